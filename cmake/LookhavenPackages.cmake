@@ -1,0 +1,24 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# Finds the libraries that we build on; docs/design/dependencies.md says why each.
+find_package(PkgConfig REQUIRED)
+find_package(Threads REQUIRED)
+pkg_check_modules(jsoncpp REQUIRED IMPORTED_TARGET jsoncpp)
+pkg_check_modules(sodium REQUIRED IMPORTED_TARGET libsodium)
+pkg_check_modules(turbojpeg REQUIRED IMPORTED_TARGET libturbojpeg)
+pkg_check_modules(libav REQUIRED IMPORTED_TARGET libavformat libavcodec libavutil libswscale libswresample)
+find_package(CLI11 REQUIRED)
+
+# Debian's libsoci-dev ships no CMake configuration.
+add_library(lookhaven_soci INTERFACE)
+foreach(part core sqlite3 postgresql)
+    find_library(SOCI_${part} soci_${part} REQUIRED)
+    target_link_libraries(lookhaven_soci INTERFACE ${SOCI_${part}})
+endforeach()
+find_path(SOCI_INCLUDE soci/soci.h REQUIRED)
+find_path(LIBPQ_INCLUDE libpq-fe.h PATH_SUFFIXES postgresql REQUIRED)
+target_include_directories(lookhaven_soci SYSTEM INTERFACE ${SOCI_INCLUDE} ${LIBPQ_INCLUDE})
+
+if(LOOKHAVEN_TESTS)
+    find_package(GTest REQUIRED)
+endif()

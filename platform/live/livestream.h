@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Live streams of cameras: rings of frames in shared memory that the recording service fills.
+#pragma once
+
+#include <cstdint>
+
+#include "platform/export.h"
+
+// The head of one frame in a ring; its data follows directly. The picture or audio block is the length - offset bytes
+// that begin offset bytes into the data.
+struct DataEntry {
+    std::int32_t m_Length;  // bytes of data, the offset's included
+    std::int32_t m_SeqNo;   // 0 … 10000, then 0 again
+    std::int32_t m_Offset;  // 0 … length
+    std::uint32_t m_Flags;  // DATA_ENTRY_KEY_FRAME
+    std::uint32_t m_TimestampLow;
+    std::uint32_t m_TimestampHigh;  // with the low word: microseconds of a clock that video and audio share
+    std::uint32_t m_Reserved[5];    // the recording service's own
+};
+static_assert(sizeof(DataEntry) == 44, "frame data begins 44 bytes after its entry");
+
+constexpr std::uint32_t DATA_ENTRY_KEY_FRAME = 2;
+
+// A sequence number that no entry has: nothing read yet.
+constexpr int DATA_ENTRY_SEQ_NONE = 10001;
+
+// One reader's position in one ring. The caller owns it and leaves its contents to the ring.
+struct __tag_DATA_ENTRY_INFO {
+    std::uint64_t m_Count = 0;    // frames ever written up to the last one read
+    std::int32_t m_Reader = -1;   // the reader's place in the ring's table
+    std::int32_t m_Pinned = -1;   // the entry being sent
+    std::uint32_t m_Generation = 0;
+};
+
+// A ring at the address where it is attached: the pointer is what shmdt takes.
+//
+// An entry that a read call returns stays as it is until the matching finish call; the writer goes round it and never
+// waits. Positions may be null; then the reader's state is the process's. No call blocks for longer than 100 ms.
+//
+// Thread safety: one thread per position, any number of readers and processes.
+class LH_PLATFORM_API ShmStreamFifo {
+  public:
+    ShmStreamFifo() = delete;
+
+    // Makes the position a reader of the ring; nothing is read yet.
+    void StartRead(__tag_DATA_ENTRY_INFO* position);
+    // The newest entry whatever was read before, or null when the ring is empty.
+    DataEntry* ReadLatest();
+    // The newest entry when it differs from lastSeq, else null. May wait up to 100 ms for one; a signal cuts the wait.
+    DataEntry* ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position);
+    // Gives the entry back; null is allowed. The flag does not tell the medium.
+    void ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position);
+    // Ends the position's reading and frees its place.
+    void StopRead(__tag_DATA_ENTRY_INFO* position);
+};
+
+// Attaches the live video of the camera's stream; null when there is none or the caller may not see it. Asks the
+// recording service for the stream and waits a bounded time (at most 5 s) for its first frame. The caller detaches with
+// shmdt.
+LH_PLATFORM_API ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo);
+
+// Keeps a live stream alive while a viewer reads it.
+class LH_PLATFORM_API LiveStreamUpdater {
+  public:
+    LiveStreamUpdater(int camId, int streamNo);
+
+    // Asks the recording service to produce the stream.
+    void StartLive();
+    // Tells the recording service that a viewer is still there. A stream that nobody stamps for 15 s or more may stop.
+    void UpdateStamp();
+
+  private:
+    int m_CamId;
+    int m_StreamNo;
+};

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A multipart answer on standard output: response head, boundaries, part heads.
+#pragma once
+
+#include "platform/export.h"
+
+// Constructing writes nothing: the response head goes out with the first part. Once the client is gone every write does
+// nothing, and SIGTERM is raised in the own process.
+//
+// Thread safety: one thread.
+class LH_PLATFORM_API MultipartResponse {
+  public:
+    MultipartResponse();
+
+    // Writes one part with the content type, after flushing standard output. data may be null with length 0: an empty
+    // part. extra: further part head lines, each ending in CR LF, or null. Returns 0, or -1 when the output is broken.
+    int Write(const char* contentType, const void* data, int length, const char* extra);
+
+  private:
+    bool m_blHeadSent;
+};

@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a user may not see, and how much the user may do.
+#pragma once
+
+#include <memory>
+#include <set>
+
+#include <json/json.h>
+
+#include "platform/export.h"
+
+// The kind of access to a camera that is asked about.
+enum CAM_PRIV_TYPE : int {
+    CAM_PRIV_LIVEVIEW = 1,
+    CAM_PRIV_PLAYBACK = 2,
+    CAM_PRIV_AUDIO = 8,
+};
+
+// The user id that stands for a peer admitted by pair matching. No account has it.
+constexpr unsigned int PAIR_AUTH_UID = 1024;
+
+// A value: copies are independent of each other.
+class LH_PLATFORM_API PrivProfile {
+  public:
+    // The platform's own data behind a profile.
+    struct Data;
+
+    // A profile of nobody: GetId() is 0.
+    PrivProfile();
+    explicit PrivProfile(std::shared_ptr<const Data> data);
+
+    // The profile's id; 0 when there is none for the user.
+    int GetId() const;
+    // 0 and 1 manage the host; larger numbers do not.
+    int GetPrivilege() const;
+    // The ids of cameras to which the user lacks the kind of access. withHidden: also those that the user's lists hide
+    // although they exist (cameras of removed groups).
+    std::set<int> GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const;
+    // Narrows the profile by the rights that a relaying host sends along; null changes nothing. Never widens it.
+    void UpdateByJson(const Json::Value& privData);
+
+  private:
+    std::shared_ptr<const Data> m_pData;
+};
+
+// The profile of the user, read afresh. PAIR_AUTH_UID gives a peer's profile, which denies nothing. For an unknown user
+// the result's GetId() is 0.
+LH_PLATFORM_API PrivProfile PrivProfileGetByUid(unsigned int uid);

@@ -1,0 +1,97 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/base/file.h"
+
+#include <array>
+#include <cerrno>
+#include <system_error>
+#include <utility>
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace lookhaven::base {
+
+void ThrowErrno(const std::string& what) { throw std::system_error(errno, std::generic_category(), what); }
+
+FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsigned int mode) {
+    FileDescriptor file(::open(path.c_str(), flags | O_CLOEXEC, mode));
+    if (!file) {
+        ThrowErrno("cannot open " + path.string());
+    }
+    return file;
+}
+
+std::string ReadFile(const std::filesystem::path& path) {
+    const FileDescriptor file = OpenFile(path, O_RDONLY);
+    std::string contents;
+    std::array<char, 16384> block{};
+    for (;;) {
+        const ssize_t got = ::read(file.Get(), block.data(), block.size());
+        if (got == 0) {
+            return contents;
+        }
+        if (got < 0 && errno != EINTR) {
+            ThrowErrno("cannot read " + path.string());
+        }
+        contents.append(block.data(), static_cast<std::size_t>(got < 0 ? 0 : got));
+    }
+}
+
+void WriteFileAtomically(const std::filesystem::path& path, std::string_view contents, unsigned int mode) {
+    std::filesystem::path temporary = path;
+    temporary += "." + std::to_string(getpid()) + ".new";
+    {
+        const FileDescriptor file = OpenFile(temporary, O_WRONLY | O_CREAT | O_TRUNC, mode);
+        for (std::string_view rest = contents; !rest.empty();) {
+            const ssize_t written = ::write(file.Get(), rest.data(), rest.size());
+            if (written < 0 && errno != EINTR) {
+                ThrowErrno("cannot write " + temporary.string());
+            }
+            rest.remove_prefix(static_cast<std::size_t>(written < 0 ? 0 : written));
+        }
+        if (::fsync(file.Get()) != 0) {
+            ThrowErrno("cannot write " + temporary.string());
+        }
+    }
+    std::filesystem::rename(temporary, path);
+}
+
+SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size_bytes, unsigned int mode)
+    : size_bytes_(size_bytes) {
+    const FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT, mode);
+    struct stat status {};
+    if (::fstat(file.Get(), &status) != 0) {
+        ThrowErrno("cannot stat " + path.string());
+    }
+    // Reserving the blocks now turns a full disk into an error here instead of a bus error later.
+    if (status.st_size < static_cast<off_t>(size_bytes)) {
+        if (const int error = ::posix_fallocate(file.Get(), 0, static_cast<off_t>(size_bytes)); error != 0) {
+            errno = error;
+            ThrowErrno("cannot reserve " + path.string());
+        }
+    }
+    data_ = ::mmap(nullptr, size_bytes, PROT_READ | PROT_WRITE, MAP_SHARED, file.Get(), 0);
+    if (data_ == MAP_FAILED) {
+        data_ = nullptr;
+        ThrowErrno("cannot map " + path.string());
+    }
+}
+
+SharedMapping::SharedMapping(SharedMapping&& other) noexcept
+    : data_(std::exchange(other.data_, nullptr)), size_bytes_(other.size_bytes_) {}
+
+SharedMapping& SharedMapping::operator=(SharedMapping&& other) noexcept {
+    std::swap(data_, other.data_);
+    std::swap(size_bytes_, other.size_bytes_);
+    return *this;
+}
+
+SharedMapping::~SharedMapping() {
+    if (data_ != nullptr) {
+        ::munmap(data_, size_bytes_);
+    }
+}
+
+}  // namespace lookhaven::base

@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/base/installation.h"
+
+#include <cstdlib>
+
+#include <sys/stat.h>
+
+#include "standalone/base/file.h"
+
+namespace lookhaven::base {
+
+namespace {
+
+// FNV-1a over device and inode: the same folder under two names is the same installation.
+std::uint64_t FolderId(const std::filesystem::path& folder) {
+    struct stat status {};
+    if (::stat(folder.c_str(), &status) != 0) {
+        ThrowErrno("cannot open the state folder " + folder.string());
+    }
+    std::uint64_t hash = 14695981039346656037ULL;
+    for (const std::uint64_t word : {std::uint64_t{status.st_dev}, std::uint64_t{status.st_ino}}) {
+        for (unsigned int shift = 0; shift < 64; shift += 8) {
+            hash = (hash ^ ((word >> shift) & 0xff)) * 1099511628211ULL;
+        }
+    }
+    return hash;
+}
+
+}  // namespace
+
+Installation::Installation(const std::filesystem::path& home)
+    : home_(std::filesystem::absolute(home).lexically_normal()), id_(FolderId(home_)) {}
+
+Installation Installation::FromEnvironment() {
+    const char* home = std::getenv("LOOKHAVEN_HOME");
+    return Installation(home != nullptr && *home != '\0' ? home : "var");
+}
+
+void Installation::CreateFolders(const std::filesystem::path& home) {
+    for (const char* folder : {"", "run", "log", "tls"}) {
+        const std::filesystem::path path = home / folder;
+        if (std::filesystem::create_directories(path)) {
+            std::filesystem::permissions(path, std::filesystem::perms::owner_all);
+        }
+    }
+}
+
+std::string Installation::StoreUrl() const {
+    const std::filesystem::path override_file = home_ / "store";
+    if (std::filesystem::exists(override_file)) {
+        std::string url = ReadFile(override_file);
+        url.erase(url.find_last_not_of(" \r\n") + 1);
+        return url;
+    }
+    return "sqlite:" + (home_ / "lookhaven.db").string();
+}
+
+}  // namespace lookhaven::base

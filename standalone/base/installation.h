@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Where one installation keeps its things: everything hangs from its state folder.
+//
+// Why so        Two installations may run side by side on one machine (tests, a trial beside the real one); they share
+//               nothing but the operating system, so names of shared memory derive from the state folder too.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <string>
+
+namespace lookhaven::base {
+
+class Installation {
+  public:
+    // The folder must exist; throws std::system_error otherwise.
+    explicit Installation(const std::filesystem::path& home);
+
+    // The folder named by LOOKHAVEN_HOME, else "var" below the working folder.
+    static Installation FromEnvironment();
+
+    // Makes the state folder and its subfolders, private to the caller, where they are missing.
+    static void CreateFolders(const std::filesystem::path& home);
+
+    const std::filesystem::path& Home() const { return home_; }
+    std::filesystem::path RunFolder() const { return home_ / "run"; }
+    std::filesystem::path LogFolder() const { return home_ / "log"; }
+    std::filesystem::path TlsFolder() const { return home_ / "tls"; }
+    std::filesystem::path WebApiSocket() const { return RunFolder() / "webapi.sock"; }
+
+    // "sqlite:<path>" or "postgresql://…": the file "store" in the state folder, else SQLite inside the folder.
+    std::string StoreUrl() const;
+
+    // Tells installations of this machine apart; stable while the folder stays where it is.
+    std::uint64_t Id() const { return id_; }
+
+  private:
+    std::filesystem::path home_;
+    std::uint64_t id_;
+};
+
+}  // namespace lookhaven::base

@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/base/log.h"
+
+#include <algorithm>
+#include <array>
+#include <atomic>
+#include <string>
+
+#include <unistd.h>
+
+#include "standalone/base/clock.h"
+
+namespace lookhaven::base {
+
+namespace {
+
+std::atomic<const char*> g_program{"lookhaven"};
+std::atomic<Severity> g_threshold{Severity::kInfo};
+
+constexpr std::array<const char*, 4> kSeverityNames{"error", "warning", "info", "debug"};
+
+}  // namespace
+
+void SetLogProgram(const char* program) { g_program = program; }
+
+void SetLogThreshold(Severity threshold) { g_threshold = threshold; }
+
+void Log(Severity severity, std::string_view text) noexcept try {
+    if (severity > g_threshold.load()) {
+        return;
+    }
+    std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
+                       kSeverityNames[static_cast<std::size_t>(severity)] + ": ";
+    line += text.substr(0, text.find_last_not_of("\r\n") + 1);
+    std::replace_if(
+        line.begin(), line.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
+    line += '\n';
+    // A log that cannot be written has nobody to tell.
+    [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
+} catch (...) {
+}
+
+}  // namespace lookhaven::base

@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Log lines on standard error, one write each, so that lines of several processes never mix.
+#pragma once
+
+#include <string_view>
+
+namespace lookhaven::base {
+
+enum class Severity { kError, kWarning, kInfo, kDebug };
+
+// Names the program in every line that follows. Text must outlive the process; give a literal.
+void SetLogProgram(const char* program);
+
+// Lines less severe than this are dropped. kInfo at start.
+void SetLogThreshold(Severity threshold);
+
+// Writes "2026-03-01T08:15:30.123Z recorder[812] error: text". Line breaks inside text become spaces. Never throws.
+//
+// Thread safety: any thread; also fit for a forked child.
+void Log(Severity severity, std::string_view text) noexcept;
+
+inline void LogError(std::string_view text) noexcept { Log(Severity::kError, text); }
+inline void LogWarning(std::string_view text) noexcept { Log(Severity::kWarning, text); }
+inline void LogInfo(std::string_view text) noexcept { Log(Severity::kInfo, text); }
+
+}  // namespace lookhaven::base
