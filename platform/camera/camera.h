@@ -51,9 +51,9 @@ class LH_PLATFORM_API Camera {
     bool m_blAudio;  // the camera hears
 };
 
-// The cameras of this host in list order. deniedIds: ids to leave out, decimal, ascending, joined by ",". groupIds: when
-// not empty, only cameras of these groups. onlyEnabled leaves out disabled cameras, withDeleted adds removed ones whose
-// recordings remain, withRemote adds cameras of recording servers.
+// The cameras of this host in list order. deniedIds: ids to leave out, decimal, ascending, joined by ",". groupIds:
+// when not empty, only cameras of these groups. onlyEnabled leaves out disabled cameras, withDeleted adds removed ones
+// whose recordings remain, withRemote adds cameras of recording servers.
 LH_PLATFORM_API std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds,
                                                   const std::string& deniedIds, bool withDeleted, bool withRemote);
 

@@ -10,7 +10,7 @@
 #include "platform/export.h"
 
 struct LHShmCommonCfg {
-    pthread_mutex_t m_Mutex;  // process-shared, robust; guards the rest
+    pthread_mutex_t m_Mutex;   // process-shared, robust; guards the rest
     std::int64_t m_Timestamp;  // monotonic seconds when the service last refreshed the record
     std::uint8_t m_blPause;    // non-zero: streams pause
 };

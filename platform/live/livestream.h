@@ -27,9 +27,9 @@ constexpr int DATA_ENTRY_SEQ_NONE = 10001;
 
 // One reader's position in one ring. The caller owns it and leaves its contents to the ring.
 struct __tag_DATA_ENTRY_INFO {
-    std::uint64_t m_Count = 0;    // frames ever written up to the last one read
-    std::int32_t m_Reader = -1;   // the reader's place in the ring's table
-    std::int32_t m_Pinned = -1;   // the entry being sent
+    std::uint64_t m_Count = 0;   // frames ever written up to the last one read
+    std::int32_t m_Reader = -1;  // the reader's place in the ring's table
+    std::int32_t m_Pinned = -1;  // the entry being sent
     std::uint32_t m_Generation = 0;
 };
 

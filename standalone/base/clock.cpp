@@ -17,9 +17,13 @@ std::int64_t Micros(clockid_t clock) {
 
 }  // namespace
 
-std::int64_t MonotonicMicros() { return Micros(CLOCK_MONOTONIC); }
+std::int64_t MonotonicMicros() {
+    return Micros(CLOCK_MONOTONIC);
+}
 
-std::int64_t WallMillis() { return Micros(CLOCK_REALTIME) / 1000; }
+std::int64_t WallMillis() {
+    return Micros(CLOCK_REALTIME) / 1000;
+}
 
 std::string FormatUtc(std::int64_t wall_millis) {
     const std::time_t seconds = static_cast<std::time_t>(wall_millis / 1000);

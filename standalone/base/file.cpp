@@ -13,7 +13,9 @@
 
 namespace lookhaven::base {
 
-void ThrowErrno(const std::string& what) { throw std::system_error(errno, std::generic_category(), what); }
+void ThrowErrno(const std::string& what) {
+    throw std::system_error(errno, std::generic_category(), what);
+}
 
 FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsigned int mode) {
     FileDescriptor file(::open(path.c_str(), flags | O_CLOEXEC, mode));
@@ -80,7 +82,8 @@ SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size
 }
 
 SharedMapping::SharedMapping(SharedMapping&& other) noexcept
-    : data_(std::exchange(other.data_, nullptr)), size_bytes_(other.size_bytes_) {}
+    : data_(std::exchange(other.data_, nullptr)),
+      size_bytes_(other.size_bytes_) {}
 
 SharedMapping& SharedMapping::operator=(SharedMapping&& other) noexcept {
     std::swap(data_, other.data_);

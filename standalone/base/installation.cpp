@@ -29,7 +29,8 @@ std::uint64_t FolderId(const std::filesystem::path& folder) {
 }  // namespace
 
 Installation::Installation(const std::filesystem::path& home)
-    : home_(std::filesystem::absolute(home).lexically_normal()), id_(FolderId(home_)) {}
+    : home_(std::filesystem::absolute(home).lexically_normal()),
+      id_(FolderId(home_)) {}
 
 Installation Installation::FromEnvironment() {
     const char* home = std::getenv("LOOKHAVEN_HOME");

@@ -21,9 +21,13 @@ constexpr std::array<const char*, 4> kSeverityNames{"error", "warning", "info", 
 
 }  // namespace
 
-void SetLogProgram(const char* program) { g_program = program; }
+void SetLogProgram(const char* program) {
+    g_program = program;
+}
 
-void SetLogThreshold(Severity threshold) { g_threshold = threshold; }
+void SetLogThreshold(Severity threshold) {
+    g_threshold = threshold;
+}
 
 void Log(Severity severity, std::string_view text) noexcept try {
     if (severity > g_threshold.load()) {

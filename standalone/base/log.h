@@ -20,8 +20,14 @@ void SetLogThreshold(Severity threshold);
 // Thread safety: any thread; also fit for a forked child.
 void Log(Severity severity, std::string_view text) noexcept;
 
-inline void LogError(std::string_view text) noexcept { Log(Severity::kError, text); }
-inline void LogWarning(std::string_view text) noexcept { Log(Severity::kWarning, text); }
-inline void LogInfo(std::string_view text) noexcept { Log(Severity::kInfo, text); }
+inline void LogError(std::string_view text) noexcept {
+    Log(Severity::kError, text);
+}
+inline void LogWarning(std::string_view text) noexcept {
+    Log(Severity::kWarning, text);
+}
+inline void LogInfo(std::string_view text) noexcept {
+    Log(Severity::kInfo, text);
+}
 
 }  // namespace lookhaven::base

@@ -34,7 +34,9 @@ std::uint64_t ProcessStartTicks(pid_t pid) {
     return field == nullptr ? 0 : std::strtoull(field + 1, nullptr, 10);
 }
 
-ProcessIdentity ThisProcess() { return {static_cast<std::int32_t>(getpid()), ProcessStartTicks(getpid())}; }
+ProcessIdentity ThisProcess() {
+    return {static_cast<std::int32_t>(getpid()), ProcessStartTicks(getpid())};
+}
 
 bool IsAlive(const ProcessIdentity& process) {
     return process.pid > 0 && process.start_ticks != 0 && ProcessStartTicks(process.pid) == process.start_ticks;

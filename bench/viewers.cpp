@@ -1,0 +1,160 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Plays many viewers of one live stream and prints, as one JSON object, how late the pictures arrived.
+//
+// A picture tells when it was made by a stamp that follows its first two bytes (see frame_stamp.h). It counts as
+// received when its last byte has been read.
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <iostream>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include <sys/epoll.h>
+#include <sys/socket.h>
+
+#include "bench/connection.h"
+#include "bench/frame_stamp.h"
+#include "bench/percentile.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/file_descriptor.h"
+
+namespace {
+
+using lookhaven::base::FileDescriptor;
+using lookhaven::base::MonotonicMicros;
+
+// Takes a multipart body apart without keeping it: heads are collected line by line, bodies are counted.
+class PartReader {
+  public:
+    // Feeds bytes as they arrive; appends one latency for each picture that ends in them.
+    void Feed(const char* data, std::size_t size, std::vector<std::int64_t>& latencies) {
+        while (size > 0) {
+            const std::size_t used = body_left_ > 0 ? TakeBody(data, size, latencies) : TakeHead(data, size);
+            data += used;
+            size -= used;
+        }
+    }
+
+  private:
+    std::size_t TakeBody(const char* data, std::size_t size, std::vector<std::int64_t>& latencies) {
+        const std::size_t used = std::min(size, body_left_);
+        if (stamp_.size() < bench::kStampedBytes) {
+            stamp_.append(data, std::min(used, bench::kStampedBytes - stamp_.size()));
+        }
+        body_left_ -= used;
+        if (body_left_ == 0) {
+            if (const std::int64_t made = bench::ReadStamp(stamp_); made > 0) {
+                latencies.push_back(MonotonicMicros() - made);
+            }
+            stamp_.clear();
+        }
+        return used;
+    }
+
+    std::size_t TakeHead(const char* data, std::size_t size) {
+        const char* end = static_cast<const char*>(std::memchr(data, '\n', size));
+        const std::size_t used = end == nullptr ? size : static_cast<std::size_t>(end - data) + 1;
+        line_.append(data, used);
+        if (end != nullptr) {
+            constexpr std::string_view kLength = "content-length:";
+            std::transform(line_.begin(), line_.end(), line_.begin(),
+                           [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+            if (line_.starts_with(kLength)) {
+                next_length_ = std::strtoull(line_.c_str() + kLength.size(), nullptr, 10);
+            } else if (line_ == "\r\n") {
+                body_left_ = std::exchange(next_length_, 0);
+            }
+            line_.clear();
+        }
+        return used;
+    }
+
+    std::string line_;
+    std::string stamp_;
+    std::size_t next_length_ = 0;
+    std::size_t body_left_ = 0;
+};
+
+struct Viewer {
+    FileDescriptor socket;
+    PartReader parts;
+};
+
+struct Options {
+    bench::Target target;
+    int viewers = 1;
+    double seconds = 10;
+};
+
+Options Parse(int count, char** arguments) {
+    Options options;
+    for (int i = 1; i + 1 < count; i += 2) {
+        const std::string_view name = arguments[i];
+        const std::string value = arguments[i + 1];
+        if (bench::TakeOption(options.target, std::string(name), value)) {
+            continue;
+        }
+        if (name == "--viewers") {
+            options.viewers = std::stoi(value);
+        } else if (name == "--seconds") {
+            options.seconds = std::stod(value);
+        } else {
+            throw std::invalid_argument("unknown option " + std::string(name));
+        }
+    }
+    return options;
+}
+
+int Run(const Options& options) {
+    const FileDescriptor poll(::epoll_create1(EPOLL_CLOEXEC));
+    std::vector<Viewer> viewers(static_cast<std::size_t>(options.viewers));
+    const std::string request = bench::Request(options.target);
+    for (std::size_t i = 0; i < viewers.size(); ++i) {
+        viewers[i].socket = bench::Connect(options.target);
+        bench::Send(viewers[i].socket, request);
+        epoll_event event{};
+        event.events = EPOLLIN;
+        event.data.u64 = i;
+        ::epoll_ctl(poll.Get(), EPOLL_CTL_ADD, viewers[i].socket.Get(), &event);
+    }
+    std::vector<std::int64_t> latencies;
+    std::int64_t bytes = 0;
+    int ended = 0;
+    std::vector<char> block(256 * 1024);
+    const std::int64_t start = MonotonicMicros();
+    const std::int64_t stop = start + static_cast<std::int64_t>(options.seconds * 1e6);
+    std::array<epoll_event, 64> events{};
+    while (MonotonicMicros() < stop && ended < options.viewers) {
+        const int ready = ::epoll_wait(poll.Get(), events.data(), static_cast<int>(events.size()), 100);
+        for (int i = 0; i < ready; ++i) {
+            Viewer& viewer = viewers[events[static_cast<std::size_t>(i)].data.u64];
+            const ssize_t got = ::recv(viewer.socket.Get(), block.data(), block.size(), MSG_DONTWAIT);
+            if (got > 0) {
+                bytes += got;
+                viewer.parts.Feed(block.data(), static_cast<std::size_t>(got), latencies);
+            } else if (got == 0) {
+                viewer.socket.Reset();
+                ++ended;
+            }
+        }
+    }
+    std::sort(latencies.begin(), latencies.end());
+    std::cout << "{\"pictures\":" << latencies.size() << ",\"bytes\":" << bytes << ",\"ended\":" << ended
+              << ",\"seconds\":" << static_cast<double>(MonotonicMicros() - start) / 1e6
+              << ",\"p50_micros\":" << bench::Percentile(latencies, 0.5)
+              << ",\"p99_micros\":" << bench::Percentile(latencies, 0.99) << "}\n";
+    return 0;
+}
+
+}  // namespace
+
+int main(int count, char** arguments) try { return Run(Parse(count, arguments)); } catch (const std::exception& error) {
+    std::cerr << "bench_viewers: " << error.what() << '\n';
+    return 1;
+}
