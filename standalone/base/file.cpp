@@ -41,23 +41,34 @@ std::string ReadFile(const std::filesystem::path& path) {
     }
 }
 
+namespace {
+
+void WriteWholeFile(const std::filesystem::path& path, std::string_view contents, unsigned int mode) {
+    const FileDescriptor file = OpenFile(path, O_WRONLY | O_CREAT | O_TRUNC, mode);
+    for (std::string_view rest = contents; !rest.empty();) {
+        const ssize_t written = ::write(file.Get(), rest.data(), rest.size());
+        if (written < 0 && errno != EINTR) {
+            ThrowErrno("cannot write " + path.string());
+        }
+        rest.remove_prefix(static_cast<std::size_t>(written < 0 ? 0 : written));
+    }
+    if (::fsync(file.Get()) != 0) {
+        ThrowErrno("cannot write " + path.string());
+    }
+}
+
+}  // namespace
+
 void WriteFileAtomically(const std::filesystem::path& path, std::string_view contents, unsigned int mode) {
     std::filesystem::path temporary = path;
     temporary += "." + std::to_string(getpid()) + ".new";
-    {
-        const FileDescriptor file = OpenFile(temporary, O_WRONLY | O_CREAT | O_TRUNC, mode);
-        for (std::string_view rest = contents; !rest.empty();) {
-            const ssize_t written = ::write(file.Get(), rest.data(), rest.size());
-            if (written < 0 && errno != EINTR) {
-                ThrowErrno("cannot write " + temporary.string());
-            }
-            rest.remove_prefix(static_cast<std::size_t>(written < 0 ? 0 : written));
-        }
-        if (::fsync(file.Get()) != 0) {
-            ThrowErrno("cannot write " + temporary.string());
-        }
+    try {
+        WriteWholeFile(temporary, contents, mode);
+        std::filesystem::rename(temporary, path);
+    } catch (...) {
+        ::unlink(temporary.c_str());
+        throw;
     }
-    std::filesystem::rename(temporary, path);
 }
 
 SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size_bytes, unsigned int mode)

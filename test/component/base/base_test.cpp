@@ -1,0 +1,102 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The ground that every process stands on: identities of processes, files that are replaced whole, the state folder.
+#include <cstdlib>
+#include <filesystem>
+#include <system_error>
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/base/installation.h"
+#include "standalone/base/process.h"
+
+namespace lookhaven::base {
+namespace {
+
+class TemporaryFolder : public testing::Test {
+  protected:
+    TemporaryFolder() {
+        std::string pattern = testing::TempDir() + "lookhaven-base-XXXXXX";
+        path_ = ::mkdtemp(pattern.data());
+    }
+    ~TemporaryFolder() override { std::filesystem::remove_all(path_); }
+
+    std::filesystem::path path_;
+};
+
+TEST(ProcessIdentityTest, ADeadProcessIsGoneEvenAsAZombieAndWhenItsIdIsReused) {
+    const pid_t child = ::fork();
+    if (child == 0) {
+        ::pause();
+        _exit(0);
+    }
+    const ProcessIdentity identity{child, ProcessStartTicks(child)};
+    EXPECT_TRUE(IsAlive(identity));
+    EXPECT_FALSE(IsAlive({child, identity.start_ticks + 1})) << "another process under the same id";
+    EXPECT_FALSE(IsAlive({child, 0}));
+    EXPECT_FALSE(IsAlive({0, identity.start_ticks}));
+
+    ::kill(child, SIGKILL);
+    siginfo_t info{};
+    ::waitid(P_PID, static_cast<id_t>(child), &info, WEXITED | WNOWAIT);
+    EXPECT_FALSE(IsAlive(identity)) << "a zombie holds nothing any more";
+    ::waitpid(child, nullptr, 0);
+    EXPECT_FALSE(IsAlive(identity));
+}
+
+TEST(ProcessIdentityTest, ACommandNameWithParenthesesAndSpacesDoesNotShiftTheFields) {
+    const std::uint64_t before = ThisProcess().start_ticks;
+    const std::string name = ReadFile("/proc/self/comm");
+    for (const char* hostile : {"a) R 1 1", "((( ", ") S 0 0 0 0 0 0"}) {
+        FileDescriptor comm = OpenFile("/proc/self/comm", O_WRONLY);
+        ASSERT_GT(::write(comm.Get(), hostile, std::string_view(hostile).size()), 0);
+        EXPECT_EQ(ThisProcess().start_ticks, before) << hostile;
+    }
+    ASSERT_GT(::write(OpenFile("/proc/self/comm", O_WRONLY).Get(), name.data(), name.size()), 0);
+}
+
+TEST_F(TemporaryFolder, AFailedReplacementLeavesTheOldFile) {
+    const auto file = path_ / "settings";
+    WriteFileAtomically(file, "old", 0640);
+    EXPECT_THROW(WriteFileAtomically(path_ / "missing" / "settings", "new"), std::system_error);
+    WriteFileAtomically(file, std::string(100'000, 'x'));
+    EXPECT_EQ(ReadFile(file), std::string(100'000, 'x'));
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(path_), {}), 1) << "no temporary file stays";
+    EXPECT_THROW(ReadFile(path_ / "nothing"), std::system_error);
+}
+
+TEST_F(TemporaryFolder, TwoMappingsOfOneFileAreTheSameMemory) {
+    SharedMapping first(path_ / "shared", 8192);
+    const SharedMapping second(path_ / "shared", 4096);
+    static_cast<char*>(first.Data())[4000] = 'z';
+    EXPECT_EQ(static_cast<char*>(second.Data())[4000], 'z');
+    EXPECT_EQ(std::filesystem::file_size(path_ / "shared"), 8192U) << "a smaller mapping does not cut the file";
+    EXPECT_THROW(SharedMapping(path_ / "no" / "folder", 4096), std::system_error);
+}
+
+TEST_F(TemporaryFolder, OneStateFolderIsOneInstallationUnderAnyName) {
+    Installation::CreateFolders(path_ / "home");
+    std::filesystem::create_directory_symlink(path_ / "home", path_ / "alias");
+    Installation::CreateFolders(path_ / "other");
+    EXPECT_EQ(Installation(path_ / "home").Id(), Installation(path_ / "alias").Id());
+    EXPECT_NE(Installation(path_ / "home").Id(), Installation(path_ / "other").Id());
+    EXPECT_EQ(std::filesystem::status(path_ / "home").permissions(), std::filesystem::perms::owner_all);
+    EXPECT_THROW(Installation(path_ / "nowhere"), std::system_error);
+
+    WriteFileAtomically(path_ / "home" / "store", "postgresql://host/db\n");
+    EXPECT_EQ(Installation(path_ / "home").StoreUrl(), "postgresql://host/db");
+    EXPECT_EQ(Installation(path_ / "other").StoreUrl(), "sqlite:" + (path_ / "other" / "lookhaven.db").string());
+}
+
+TEST(ClockTest, DatesAreUtcWithMilliseconds) {
+    EXPECT_EQ(FormatUtc(0), "1970-01-01T00:00:00.000Z");
+    EXPECT_EQ(FormatUtc(951'827'696'007), "2000-02-29T12:34:56.007Z");
+}
+
+}  // namespace
+}  // namespace lookhaven::base
