@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Cameras: what they are called, where their streams come from, what they can do.
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+// The numbers are stored, and go to clients.
+enum class VideoType : int { kMjpeg = 1, kH264 = 3, kH265 = 6 };
+
+constexpr int kProfileCount = 3;
+
+// One stream of a camera; its number is that of the live stream too.
+struct CameraProfile {
+    int number = 0;      // 0 … kProfileCount - 1
+    std::string source;  // "rtsp://", "http://", "https://", "file:" or "test:", without account and password
+    int width = 0;       // as asked for; 0 = as the source has it
+    int height = 0;
+    int fps = 0;
+};
+
+struct Camera {
+    int id = 0;        // from 1, never used twice, since recordings carry it
+    std::string name;  // UTF-8, 1 to 255 bytes
+    bool enabled = true;
+    VideoType video_type = VideoType::kMjpeg;
+    int live_profile = 0;  // the number of the profile that the live view shows
+    bool ptz = false;
+    bool audio = false;
+    std::vector<CameraProfile> profiles;  // by number, at least the live one
+
+    // Null when the camera lacks that profile.
+    const CameraProfile* FindProfile(int number) const;
+};
+
+// What the recorder logs in to the camera with.
+struct Credentials {
+    std::string account;
+    std::string password;
+};
+
+// Invariants    (1) Every change raises Settings::Revision() in the same transaction.
+//               (2) Credentials come out of FindCredentials alone, never with the record.
+class Cameras {
+  public:
+    // The store must outlive this object.
+    explicit Cameras(Store& store) : connection_(store.connection()) {}
+
+    // Stores the record under a new id, which it returns; the record's own id is not looked at. Throws InvalidRecord.
+    int Add(const Camera& camera);
+    // Replaces the record of camera.id. Throws InvalidRecord or NotFound.
+    void Update(const Camera& camera);
+    // Removes record and credentials; recordings and denials stay. Throws NotFound.
+    void Remove(int id);
+
+    std::optional<Camera> Find(int id);
+    std::vector<Camera> List();  // by id
+
+    // Nothing removes them. Throws NotFound for an unknown camera.
+    void SetCredentials(int id, const std::optional<Credentials>& credentials);
+    std::optional<Credentials> FindCredentials(int id);
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store

@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Logins: a secret that the browser keeps in its cookie, and a public handle that names the session everywhere else.
+//
+// Why so        The handle becomes part of file names and log lines, so it must open nothing; and a copy of the store
+//               must not log anybody in, so it holds only a hash of the secret.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "standalone/store/store.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::store {
+
+// A session ends when it was not used for idle_s, and in any case absolute_s after the login.
+struct SessionLifetime {
+    std::int64_t idle_s = std::int64_t{12} * 3600;
+    std::int64_t absolute_s = std::int64_t{7} * 86400;
+};
+
+struct NewSession {
+    std::string secret;  // 64 hex digits; given out once, here
+    std::string handle;  // 32 hex digits
+};
+
+struct Session {
+    std::string handle;
+    User user;
+    std::int64_t created_s = 0;
+    std::int64_t last_seen_s = 0;  // to the minute
+    std::int64_t expires_s = 0;
+};
+
+class Sessions {
+  public:
+    // The store must outlive this object.
+    explicit Sessions(Store& store, SessionLifetime lifetime = {})
+        : connection_(store.connection()),
+          lifetime_(lifetime) {}
+
+    // Throws NotFound for an unknown user.
+    NewSession Create(int user_id, std::int64_t now_s);
+
+    // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
+    std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
+
+    // Notes that the session is in use and moves its end. Writes at most once a minute; true when it wrote.
+    bool Touch(const Session& session, std::int64_t now_s);
+
+    // False when there was no such session.
+    bool End(std::string_view handle);
+    // The number of sessions ended.
+    int EndOfUser(int user_id);
+
+    // Those of the handles whose session is over: unknown, expired or ended. One query.
+    std::vector<std::string> EndedAmong(const std::vector<std::string>& handles, std::int64_t now_s);
+
+    // The number of rows deleted.
+    int PurgeExpired(std::int64_t now_s);
+
+  private:
+    Connection& connection_;
+    SessionLifetime lifetime_;
+};
+
+}  // namespace lookhaven::store

@@ -1,0 +1,83 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One connection to the record store: users, sessions, cameras, settings.
+//
+// Why so        A request process opens the store, asks a few questions and closes it, so opening is cheap and does no
+//               more than check that the schema is the one this program knows. SQLite and PostgreSQL take the same
+//               statements; what differs stands in connection.cpp alone.
+// Thread safety One Store per thread. Any number of processes. A Store must not be used across fork().
+// See           users.h, sessions.h, cameras.h, settings.h, login_throttle.h: the records and what can be asked of
+// them.
+//               Every time is UTC seconds since the epoch and comes from the caller.
+#pragma once
+
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace lookhaven::store {
+
+// The store cannot be reached, or failed while it was asked.
+class StoreError : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
+// The schema is missing, older or newer than this program's; the text says what to do.
+class SchemaError : public StoreError {
+  public:
+    using StoreError::StoreError;
+};
+
+// The caller's record breaks a rule (a name, a source, a level); nothing was changed. The text names the rule.
+class InvalidRecord : public std::invalid_argument {
+  public:
+    using std::invalid_argument::invalid_argument;
+};
+
+// There is such a record already; nothing was changed.
+class AlreadyExists : public InvalidRecord {
+  public:
+    using InvalidRecord::InvalidRecord;
+};
+
+// There is no such record; nothing was changed.
+class NotFound : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
+class Connection;
+
+class Store {
+  public:
+    // url: "sqlite:<path>", "postgresql://…" or "postgresql:<connection options>". Throws SchemaError when the store
+    // was not set up by this version, StoreError when it cannot be opened. Creates nothing.
+    static Store Open(const std::string& url);
+
+    // Brings the store to this program's schema, from nothing or from any older version, in one transaction; returns
+    // the number of steps taken, 0 when there was nothing to do. A new SQLite file is private to its owner.
+    static int Migrate(const std::string& url);
+
+    // The schema version this program needs.
+    static int SchemaVersion();
+
+    Store(Store&&) noexcept;
+    Store& operator=(Store&&) noexcept;
+    ~Store();
+
+    // What is wrong with the stored data, a sentence each; empty when it is sound. Takes time in proportion to the
+    // store.
+    std::vector<std::string> Check();
+
+    // For the record classes of this folder.
+    Connection& connection() { return *connection_; }
+
+  private:
+    explicit Store(std::unique_ptr<Connection> connection);
+
+    std::unique_ptr<Connection> connection_;
+};
+
+}  // namespace lookhaven::store

@@ -1,0 +1,66 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Accounts: who may log in, how much they may do, which cameras are denied to them.
+#pragma once
+
+#include <initializer_list>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+// Stands for a peer admitted by pair matching; no account ever has this id.
+constexpr int kPeerUserId = 1024;
+
+enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
+
+// What a user may be denied at a camera; the numbers are stored.
+enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8 };
+constexpr std::initializer_list<CameraAccess> kEveryAccess = {CameraAccess::kLive, CameraAccess::kPlayback,
+                                                              CameraAccess::kAudio};
+
+struct User {
+    int id = 0;  // from 1, never used twice
+    std::string name;
+    Privilege privilege = Privilege::kViewer;
+
+    bool IsManager() const { return privilege <= Privilege::kManager; }
+};
+
+// Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
+//               (2) Names are told apart without regard to case, and "Lookhaven" is nobody's name.
+class Users {
+  public:
+    // The store must outlive this object.
+    explicit Users(Store& store) : connection_(store.connection()) {}
+
+    // name: 1 to 64 ASCII letters, digits, ".", "_", "-", "@", the first a letter or digit. password: 8 to 1,024 bytes.
+    // Takes a tenth of a second and 64 MiB, as does every use of a password. Throws InvalidRecord or AlreadyExists.
+    User Add(std::string_view name, std::string_view password, Privilege privilege);
+
+    // The account when name and password are right. An unknown name takes as long as a wrong password.
+    std::optional<User> CheckPassword(std::string_view name, std::string_view password);
+
+    std::optional<User> Find(int id);
+    std::optional<User> FindByName(std::string_view name);
+    std::vector<User> List();  // by id
+
+    // These throw NotFound for an unknown id.
+    void SetPassword(int id, std::string_view password);
+    void Deny(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
+    void Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
+    void Remove(int id);
+
+    // The cameras at which the user lacks that access; empty for an unknown user.
+    std::set<int> DeniedCameras(int id, CameraAccess kind);
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store
