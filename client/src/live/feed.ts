@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Keeps one picture on the screen live: runs a source, reconnects with growing waits, and judges the signal.
+
+import { ServerError } from "../wire/server";
+import { Backoff } from "./backoff";
+import { SignalJudge, type SignalState } from "./signal_state";
+import { pause, type Frame, type LiveSource } from "./source";
+
+export class Feed {
+  readonly #show: (frame: Frame) => void;
+  readonly #changed: () => void;
+  readonly #judge = new SignalJudge();
+  #source: LiveSource | null = null;
+  #run: AbortController | null = null;
+
+  /** `show` draws and closes a frame; `changed` is told when the state may have changed by something other than time. */
+  constructor(show: (frame: Frame) => void, changed: () => void) {
+    this.#show = show;
+    this.#changed = changed;
+  }
+
+  /** Null while stopped. */
+  get source(): LiveSource | null {
+    return this.#source;
+  }
+
+  /** Changes with time too: ask again about twice a second. */
+  state(): SignalState {
+    return this.#judge.state();
+  }
+
+  /** Starts, or goes over to another source without losing what is known of the signal. */
+  play(source: LiveSource): void {
+    if (source === this.#source) return;
+    this.#run?.abort();
+    this.#run = new AbortController();
+    this.#source = source;
+    this.#judge.begin(source.lostAfterMs);
+    void this.#keepRunning(source, this.#run.signal);
+    this.#changed();
+  }
+
+  /** Closes the connection. */
+  stop(): void {
+    this.#run?.abort();
+    this.#run = this.#source = null;
+    this.#judge.end();
+    this.#changed();
+  }
+
+  async #keepRunning(source: LiveSource, signal: AbortSignal): Promise<void> {
+    const backoff = new Backoff();
+    const show = (frame: Frame) => {
+      const before = this.#judge.state().kind;
+      backoff.reset();
+      this.#judge.picture(frame.capturedMs, frame.ageMs);
+      this.#show(frame);
+      if (this.#judge.state().kind !== before) this.#changed();
+    };
+    while (!signal.aborted) {
+      let reason = "";
+      try {
+        await source.run(show, signal);
+      } catch (error) {
+        reason = error instanceof ServerError ? error.message : "The picture cannot be shown.";
+      }
+      if (signal.aborted) return;
+      this.#judge.broke(reason);
+      this.#changed();
+      await pause(backoff.next(), signal);
+    }
+  }
+}

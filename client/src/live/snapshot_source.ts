@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Live pictures of a camera by asking for a snapshot again and again: for tiles that get no stream of their own.
+
+import type { Server } from "../wire/server";
+import { pause, type Frame, type LiveSource } from "./source";
+import type { Turns } from "./turns";
+
+/** A camera that answers does so at once; one that does not must not keep the others waiting for long. */
+const kAnswerLimitMs = 3_000;
+
+export class SnapshotSource implements LiveSource {
+  readonly lostAfterMs = 10_000;
+  readonly everyMs = 2_000;
+  readonly #server: Server;
+  readonly #cameraId: number;
+  readonly #turns: Turns;
+
+  /** `turns` is shared by all that poll the same server. */
+  constructor(server: Server, cameraId: number, turns: Turns) {
+    this.#server = server;
+    this.#cameraId = cameraId;
+    this.#turns = turns;
+  }
+
+  async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
+    while (!signal.aborted) {
+      try {
+        const snapshot = await this.#turns.run(signal, () =>
+          this.#server.snapshot(this.#cameraId, signal, kAnswerLimitMs),
+        );
+        const image = await createImageBitmap(snapshot.jpeg);
+        if (signal.aborted) return image.close();
+        show({ image, capturedMs: snapshot.takenMs, ageMs: 0 });
+      } catch (error) {
+        if (signal.aborted) return;
+        throw error;
+      }
+      await pause(this.everyMs, signal);
+    }
+  }
+}

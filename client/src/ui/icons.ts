@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The client's icons, drawn on a grid of 24 with round strokes of 1.75 in the colour of the text.
+
+const kShapes = {
+  lantern: "M12 2.5v2 M8.5 8a3.5 3.5 0 0 1 7 0 M7.5 8h9 M9 8l-1.5 13h9L15 8 M8.3 14.5h7.4 M18.5 6.5 21 5.5 M5.5 6.5 3 5.5",
+  snapshot:
+    "M4.5 7.5h3L9 5h6l1.5 2.5h3A1.5 1.5 0 0 1 21 9v8.5a1.5 1.5 0 0 1-1.5 1.5h-15A1.5 1.5 0 0 1 3 17.5V9a1.5 1.5 0 0 1 1.5-1.5Z " +
+    "M15.5 13a3.5 3.5 0 1 1-7 0a3.5 3.5 0 0 1 7 0",
+  download: "M12 4v11 M7.5 11 12 15.5 16.5 11 M4.5 19.5h15",
+  close: "M6 6l12 12 M18 6 6 18",
+  back: "M19.5 12h-15 M10.5 5.5 4 12l6.5 6.5",
+  previous: "M14.5 5.5 8 12l6.5 6.5",
+  next: "M9.5 5.5 16 12l-6.5 6.5",
+  fullScreen: "M4 9V4h5 M15 4h5v5 M20 15v5h-5 M9 20H4v-5",
+  logout: "M10 4H5.5A1.5 1.5 0 0 0 4 5.5v13A1.5 1.5 0 0 0 5.5 20H10 M15.5 7.5 20 12l-4.5 4.5 M20 12H9.5",
+  noSignal:
+    "M3 3l18 18 M10 6h4.5A1.5 1.5 0 0 1 16 7.5V12l5-3v8 M16 16v.5a1.5 1.5 0 0 1-1.5 1.5h-10A1.5 1.5 0 0 1 3 16.5v-9A1.5 1.5 0 0 1 4.5 6H6",
+  camera: "M4.5 6h10A1.5 1.5 0 0 1 16 7.5v9a1.5 1.5 0 0 1-1.5 1.5h-10A1.5 1.5 0 0 1 3 16.5v-9A1.5 1.5 0 0 1 4.5 6Z M16 11l5-3v8l-5-3",
+  warning: "M12 4 2.8 19.5h18.4Z M12 10v4.5 M12 17v.2",
+  layoutAuto: "M4 4h9.5v16H4Z M17 4h3v5h-3Z M17 12.5h3V20h-3Z",
+  layout1: "M4 5h16v14H4Z",
+  layout2: "M4 5h16v14H4Z M12 5v14 M4 12h16",
+  layout3: "M4 5h16v14H4Z M9.3 5v14 M14.7 5v14 M4 9.7h16 M4 14.3h16",
+} as const;
+
+export type IconName = keyof typeof kShapes;
+
+const kSvg = "http://www.w3.org/2000/svg";
+
+/** Purely visual: the control around it carries the label. */
+export function icon(name: IconName): SVGSVGElement {
+  const svg = document.createElementNS(kSvg, "svg");
+  const attributes = { viewBox: "0 0 24 24", class: "icon", "aria-hidden": "true", focusable: "false" };
+  for (const [attribute, value] of Object.entries(attributes)) svg.setAttribute(attribute, value);
+  const path = document.createElementNS(kSvg, "path");
+  path.setAttribute("d", kShapes[name]);
+  svg.append(path);
+  return svg;
+}

@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// How many columns of which width make the best use of the wall.
+
+export type LayoutChoice = "auto" | "1" | "2" | "3";
+
+export const kLayoutChoices: readonly LayoutChoice[] = ["auto", "1", "2", "3"];
+
+export interface Space {
+  widthPx: number;
+  heightPx: number;
+  /** Between tiles. */
+  gapPx: number;
+  /** Of a tile's bar with name and state, below its picture. */
+  barPx: number;
+}
+
+/** Below this width a screen shows one column, whatever was chosen. */
+const kPhoneWidthPx = 640;
+const kSmallestTilePx = 240;
+const kPictureRatio = 16 / 9;
+
+/** Columns and width of a tile; what does not fit on the screen is scrolled. */
+export function arrange(tiles: number, choice: LayoutChoice, space: Space): { columns: number; tilePx: number } {
+  const widthFor = (columns: number) => Math.floor((space.widthPx - space.gapPx * (columns - 1)) / columns);
+  const widthToFit = (columns: number, rows: number) => {
+    const heightPx = (space.heightPx - space.gapPx * (rows - 1)) / rows - space.barPx;
+    return Math.min(widthFor(columns), Math.floor(heightPx * kPictureRatio));
+  };
+
+  if (space.widthPx < kPhoneWidthPx) return { columns: 1, tilePx: widthFor(1) };
+  if (choice !== "auto") {
+    const side = Number(choice);
+    return { columns: side, tilePx: Math.max(widthToFit(side, side), Math.min(kSmallestTilePx, widthFor(side))) };
+  }
+  let best = { columns: 1, tilePx: widthToFit(1, tiles) };
+  for (let columns = 2; columns <= tiles; columns += 1) {
+    const tilePx = widthToFit(columns, Math.ceil(tiles / columns));
+    if (tilePx > best.tilePx) best = { columns, tilePx };
+  }
+  if (best.tilePx >= kSmallestTilePx) return best;
+  const columns = Math.max(1, Math.floor((space.widthPx + space.gapPx) / (kSmallestTilePx + space.gapPx)));
+  return { columns, tilePx: widthFor(columns) };
+}

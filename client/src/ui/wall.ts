@@ -1,0 +1,218 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a logged-in user sees: the bar, the grid of all cameras, and over it the large view of one.
+
+import { ServerError, type Account, type Camera, type CameraList, type Server } from "../wire/server";
+import { iconButton } from "./button";
+import { element, setText } from "./dom";
+import { Grid } from "./grid";
+import { icon, type IconName } from "./icons";
+import { LargeView, type LargeViewActions } from "./large_view";
+import { kLayoutChoices, type LayoutChoice } from "./layout";
+import { notify } from "./notice";
+import { canShow } from "./picture";
+import { openCamera, showCamera, showWall } from "./route";
+import { SnapshotDialog } from "./snapshot_dialog";
+import { clockTime } from "./text";
+
+const kTickMs = 500;
+/** Cameras come and go seldom. */
+const kListEveryMs = 30_000;
+const kLayoutKey = "lookhaven.layout";
+
+const kLayoutLabels: Record<LayoutChoice, [IconName, string]> = {
+  auto: ["layoutAuto", "All cameras on the screen"],
+  "1": ["layout1", "One camera"],
+  "2": ["layout2", "Two by two"],
+  "3": ["layout3", "Three by three"],
+};
+
+export class Wall {
+  readonly root: HTMLElement;
+  readonly #server: Server;
+  readonly #grid: Grid;
+  readonly #dialog: SnapshotDialog;
+  readonly #onLogout: () => void;
+  readonly #count = element("p", { class: "wall-count" });
+  readonly #clock = element("time", { class: "wall-clock" });
+  readonly #progress = element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" });
+  readonly #message = element("div", { class: "wall-message" });
+  readonly #front: HTMLElement;
+  readonly #onRoute = () => this.#followRoute();
+  readonly #onKey = (event: KeyboardEvent) => this.#key(event);
+  readonly #onVisible = () => void (document.hidden || this.#load());
+  readonly #tick = setInterval(() => this.#refresh(), kTickMs);
+  readonly #listTimer = setInterval(() => void (document.hidden || this.#load()), kListEveryMs);
+  #cameras: Camera[] | null = null;
+  #large: LargeView | null = null;
+  #trouble = "";
+  #closed = false;
+
+  constructor(server: Server, account: Account, onLogout: () => void) {
+    this.#server = server;
+    this.#onLogout = onLogout;
+    this.#dialog = new SnapshotDialog(server);
+    this.#grid = new Grid(server, { open: (camera) => showCamera(camera.id), snapshot: (camera) => this.#snapshot(camera) });
+    this.#front = element("div", { class: "wall" }, this.#bar(account), this.#progress, this.#message, this.#grid.root);
+    this.root = element("main", { class: "screen" }, this.#front, this.#dialog.root);
+    addEventListener("popstate", this.#onRoute);
+    document.addEventListener("keydown", this.#onKey);
+    document.addEventListener("visibilitychange", this.#onVisible);
+    this.#refresh();
+    void this.#load();
+  }
+
+  /** Closes all streams. */
+  close(): void {
+    this.#closed = true;
+    clearInterval(this.#tick);
+    clearInterval(this.#listTimer);
+    removeEventListener("popstate", this.#onRoute);
+    document.removeEventListener("keydown", this.#onKey);
+    document.removeEventListener("visibilitychange", this.#onVisible);
+    if (this.#dialog.isOpen) this.#dialog.root.close();
+    this.#large?.close();
+    this.#grid.close();
+  }
+
+  #bar(account: Account): HTMLElement {
+    const logout = iconButton("logout", `Log out ${account.account}`, () => void this.#logout());
+    const brand = element("div", { class: "brand" }, icon("lantern"), element("h1", {}, "Lookhaven"));
+    return element("header", { class: "bar" }, brand, this.#count, this.#layoutPicker(), this.#clock, logout);
+  }
+
+  #layoutPicker(): HTMLElement {
+    const stored = localStorage.getItem(kLayoutKey);
+    const picker = element("div", { class: "segments", role: "group", "aria-label": "Layout" });
+    const choose = (choice: LayoutChoice) => {
+      this.#grid.setLayout(choice);
+      localStorage.setItem(kLayoutKey, choice);
+      for (const button of picker.children) {
+        button.setAttribute("aria-pressed", String((button as HTMLElement).dataset["layout"] === choice));
+      }
+    };
+    for (const choice of kLayoutChoices) {
+      const button = iconButton(...kLayoutLabels[choice], () => choose(choice));
+      button.dataset["layout"] = choice;
+      picker.append(button);
+    }
+    choose(kLayoutChoices.find((choice) => choice === stored) ?? "auto");
+    return picker;
+  }
+
+  async #load(): Promise<void> {
+    try {
+      const list = await this.#server.cameras();
+      if (this.#closed) return;
+      this.#showList(list);
+      this.#trouble = "";
+    } catch (error) {
+      this.#trouble = error instanceof ServerError ? error.message : "The list of cameras cannot be read.";
+      if (!this.#cameras) this.#showMessage("warning", this.#trouble, true);
+    } finally {
+      this.#progress.hidden = true;
+      this.#refresh();
+    }
+  }
+
+  #showList(list: CameraList): void {
+    this.#cameras = list.camera ?? [];
+    this.#grid.setCameras(this.#cameras);
+    if (this.#cameras.length > 0) this.#message.replaceChildren();
+    else if (list.CamNum > 0) this.#showMessage("camera", "No camera is switched on.", false);
+    else this.#showMessage("camera", "There is no camera for you to see yet.", false);
+    this.#followRoute();
+  }
+
+  #showMessage(name: IconName, sentence: string, canRetry: boolean): void {
+    const parts: Node[] = [icon(name), element("p", { role: canRetry ? "alert" : "status" }, sentence)];
+    if (canRetry) {
+      const retry = element("button", { type: "button", class: "button" }, "Try again");
+      retry.addEventListener("click", () => {
+        this.#progress.hidden = false;
+        this.#message.replaceChildren();
+        void this.#load();
+      });
+      parts.push(retry);
+    }
+    this.#message.replaceChildren(...parts);
+  }
+
+  #refresh(): void {
+    const lost = this.#grid.refresh();
+    this.#large?.refresh();
+    setText(this.#clock, clockTime(Date.now()));
+    const cameras = this.#cameras?.length ?? 0;
+    const counted = `${cameras} ${cameras === 1 ? "camera" : "cameras"}${lost > 0 ? ` · ${lost} without signal` : ""}`;
+    setText(this.#count, this.#cameras === null ? "" : this.#trouble || counted);
+    this.#count.classList.toggle("alarm", this.#trouble !== "" || lost > 0);
+  }
+
+  #followRoute(): void {
+    const camera = this.#cameras?.find(({ id }) => id === openCamera());
+    if (camera && camera.id === this.#large?.camera.id) return;
+    const left = this.#large?.camera.id;
+    this.#large?.close();
+    this.#large = null;
+    this.#front.hidden = camera !== undefined;
+    if (camera) this.#openLarge(camera);
+    else if (left !== undefined) this.#grid.tile(left)?.focus();
+  }
+
+  #openLarge(camera: Camera): void {
+    const actions: LargeViewActions = {
+      back: showWall,
+      step: (by) => this.#step(by),
+      snapshot: () => this.#snapshot(camera),
+      fullScreen: toggleFullScreen,
+    };
+    this.#large = new LargeView(camera, this.#server, actions, this.#grid.tile(camera.id)?.picture);
+    this.root.prepend(this.#large.root);
+    this.#large.focus();
+  }
+
+  #step(by: 1 | -1): void {
+    const cameras = this.#cameras ?? [];
+    const at = cameras.findIndex(({ id }) => id === this.#large?.camera.id);
+    const next = cameras[(at + by + cameras.length) % cameras.length];
+    if (next) showCamera(next.id);
+  }
+
+  #snapshot(camera: Camera): void {
+    if (canShow(camera)) void this.#dialog.take(camera);
+    else notify(`Snapshots of ${camera.name} are not available yet.`);
+  }
+
+  #key(event: KeyboardEvent): void {
+    if (this.#dialog.isOpen || event.altKey || event.ctrlKey || event.metaKey || event.defaultPrevented) return;
+    const camera = this.#large?.camera ?? this.#grid.currentTile()?.camera;
+    const key = event.key.toLowerCase();
+    if (key === "s" && camera) this.#snapshot(camera);
+    else if (!this.#large) return;
+    else if (key === "escape") showWall();
+    else if (key === "arrowleft" || key === "arrowup") this.#step(-1);
+    else if (key === "arrowright" || key === "arrowdown") this.#step(1);
+    else if (key === "f") toggleFullScreen();
+    else return;
+    event.preventDefault();
+  }
+
+  async #logout(): Promise<void> {
+    this.#progress.hidden = false;
+    try {
+      await this.#server.logout();
+      this.#onLogout();
+    } catch (error) {
+      this.#progress.hidden = true;
+      if (error instanceof ServerError && error.status === 401) return;
+      notify(`You are still logged in: ${error instanceof ServerError ? error.message : String(error)}`);
+    }
+  }
+}
+
+/** The whole page goes full screen, so that the user can go from camera to camera there. */
+function toggleFullScreen(): void {
+  // Refused where the browser has none: then nothing changes.
+  const change = document.fullscreenElement ? document.exitFullscreen() : document.documentElement.requestFullscreen?.();
+  change?.catch(() => undefined);
+}

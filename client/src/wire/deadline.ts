@@ -1,0 +1,38 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Lets a request end when its owner no longer wants it, or when nothing has come from it for too long.
+
+export class Deadline {
+  readonly #abort = new AbortController();
+  readonly #owner: AbortSignal | undefined;
+  readonly #onOwnerAbort = () => this.#abort.abort();
+  #timer: ReturnType<typeof setTimeout> | undefined;
+
+  /** Runs from now on; call `extend` at each sign of life and `release` at the end. */
+  constructor(
+    readonly limitMs: number,
+    owner?: AbortSignal,
+  ) {
+    this.#owner = owner;
+    owner?.addEventListener("abort", this.#onOwnerAbort);
+    if (owner?.aborted) this.#abort.abort();
+    this.extend();
+  }
+
+  /** Hand this to fetch. */
+  get signal(): AbortSignal {
+    return this.#abort.signal;
+  }
+
+  extend(): void {
+    clearTimeout(this.#timer);
+    this.#timer = setTimeout(() => this.#abort.abort(), this.limitMs);
+  }
+
+  /** Closes the request as well, if it is still open. */
+  release(): void {
+    clearTimeout(this.#timer);
+    this.#owner?.removeEventListener("abort", this.#onOwnerAbort);
+    this.#abort.abort();
+  }
+}

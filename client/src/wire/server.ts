@@ -1,0 +1,191 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The web API as the client uses it: typed answers, and for each failure one sentence that a person understands.
+
+import { Deadline } from "./deadline";
+
+export interface Account {
+  account: string;
+  user_id: number;
+  is_manager: boolean;
+}
+
+export interface Camera {
+  id: number;
+  name: string;
+  video_type: number;
+  liveview_port: number;
+  cam_ptz: number;
+  sound_support: number;
+}
+
+/** Answer of LoadCamera. */
+export interface CameraList {
+  /** Absent when no camera is enabled. */
+  camera?: Camera[];
+  selected: number;
+  isManager: boolean;
+  ShowAll: number;
+  CamNum: number;
+  EnableCamNum: number;
+}
+
+export interface Snapshot {
+  jpeg: Blob;
+  /** Unix milliseconds. */
+  takenMs: number;
+}
+
+/** The video type whose live view is a sequence of JPEG pictures. */
+export const kVideoTypeMjpeg = 1;
+
+const kAnswerLimitMs = 20_000;
+
+/** A request that failed; `message` is for the user. */
+export class ServerError extends Error {
+  /** `status` is the HTTP status, 0 when no answer came; `code` is the API's own number, 0 without one. */
+  constructor(
+    readonly status: number,
+    readonly code: number,
+    message: string,
+  ) {
+    super(message);
+  }
+}
+
+interface Failure {
+  error?: { code?: number; message?: string };
+}
+
+function sentenceFor(status: number, serverMessage: string | undefined): string {
+  switch (status) {
+    case 0:
+      return "The server does not answer.";
+    case 401:
+      return "You are not logged in.";
+    case 429:
+      return "Too many attempts. Wait a minute, then try again.";
+    case 503:
+      return "The server is busy.";
+    case 504:
+      return "The camera sends no picture.";
+    default:
+      return serverMessage || (status < 400 ? "The server refused." : `The server could not answer (${status}).`);
+  }
+}
+
+async function failureOf(answer: Response): Promise<ServerError> {
+  let failure: Failure = {};
+  try {
+    failure = ((await answer.json()) as Failure | null) ?? {};
+  } catch {
+    // A web server's own error page is no JSON; the status says enough.
+  }
+  return new ServerError(answer.status, failure.error?.code ?? 0, sentenceFor(answer.status, failure.error?.message));
+}
+
+export class Server {
+  readonly #onSessionEnd: () => void;
+
+  /** `onSessionEnd` is called whenever an answer says that there is no session (any more). */
+  constructor(onSessionEnd: () => void) {
+    this.#onSessionEnd = onSessionEnd;
+  }
+
+  /** The account of the running session, or null without one. */
+  async status(): Promise<Account | null> {
+    try {
+      return await this.#call<Account>("VEXO.Auth", "Status", {}, { quiet: true });
+    } catch (error) {
+      if (error instanceof ServerError && error.status === 401) return null;
+      throw error;
+    }
+  }
+
+  async login(account: string, password: string): Promise<Account> {
+    try {
+      return await this.#call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true });
+    } catch (error) {
+      if (error instanceof ServerError && error.status === 401) {
+        throw new ServerError(401, error.code, "The account or the password is wrong.");
+      }
+      throw error;
+    }
+  }
+
+  async logout(): Promise<void> {
+    await this.#call<unknown>("VEXO.Auth", "Logout", {}, { form: {} });
+  }
+
+  async cameras(): Promise<CameraList> {
+    return this.#call<CameraList>("VEXO.Lookhaven.Player", "LoadCamera", {});
+  }
+
+  /** One picture in the camera's usual size. */
+  async snapshot(cameraId: number, owner?: AbortSignal, limitMs = kAnswerLimitMs): Promise<Snapshot> {
+    const deadline = new Deadline(limitMs, owner);
+    try {
+      const answer = await this.#play({ camera: String(cameraId), snapshot: "1" }, deadline.signal);
+      const captured = Number(answer.headers.get("X-Capture-Time"));
+      return { jpeg: await answer.blob(), takenMs: captured > 0 ? captured * 1000 : Date.now() };
+    } catch (error) {
+      throw asServerError(error);
+    } finally {
+      deadline.release();
+    }
+  }
+
+  /**
+   * Opens a live stream; the caller reads its body and ends it with `signal`. `profile` null means the camera's own choice.
+   */
+  async live(cameraId: number, profile: number | null, signal: AbortSignal): Promise<Response> {
+    const parameters: Record<string, string> = { camera: String(cameraId) };
+    if (profile !== null) parameters["profileType"] = String(profile);
+    return this.#play(parameters, signal).catch((error: unknown) => {
+      throw asServerError(error);
+    });
+  }
+
+  /** An answer of pictures; a JSON answer in their place, whatever its status, is a failure. */
+  async #play(parameters: Record<string, string>, signal: AbortSignal): Promise<Response> {
+    const answer = await fetch(address("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters), { signal });
+    if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
+    if (answer.status === 401) this.#onSessionEnd();
+    throw await failureOf(answer);
+  }
+
+  async #call<Data>(
+    api: string,
+    method: string,
+    parameters: Record<string, string>,
+    how: { form?: Record<string, string>; quiet?: boolean } = {},
+  ): Promise<Data> {
+    const deadline = new Deadline(kAnswerLimitMs);
+    try {
+      const answer = await fetch(address(api, method, parameters), {
+        signal: deadline.signal,
+        ...(how.form ? { method: "POST", body: new URLSearchParams(how.form) } : {}),
+      });
+      if (answer.status === 401 && !how.quiet) this.#onSessionEnd();
+      if (!answer.ok) throw await failureOf(answer);
+      const envelope = (await answer.clone().json()) as { success?: boolean; data?: Data };
+      if (envelope.success !== true) throw await failureOf(answer);
+      return envelope.data as Data;
+    } catch (error) {
+      throw asServerError(error);
+    } finally {
+      deadline.release();
+    }
+  }
+}
+
+function address(api: string, method: string, parameters: Record<string, string>): string {
+  return `webapi?${new URLSearchParams({ api, version: "1", method, ...parameters })}`;
+}
+
+function asServerError(error: unknown): ServerError {
+  if (error instanceof ServerError) return error;
+  // fetch speaks of a lost connection as TypeError, of our deadline as AbortError; JSON that is none is a SyntaxError.
+  if (error instanceof SyntaxError) return new ServerError(502, 0, "The server's answer makes no sense.");
+  return new ServerError(0, 0, sentenceFor(0, undefined));
+}
