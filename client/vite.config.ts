@@ -13,7 +13,7 @@ export default defineConfig({
     assetsInlineLimit: 0,
     modulePreload: { polyfill: false },
   },
-  server: { proxy: { "/webapi": "http://127.0.0.1:8080" } },
+  server: { proxy: { "/webapi": "http://127.0.0.1:8080" }, fs: { allow: [".", "../test/client"] } },
   test: {
     dir: "../test/client",
     include: ["**/*.test.ts"],

@@ -3,7 +3,7 @@
 // The client's icons, drawn on a grid of 24 with round strokes of 1.75 in the colour of the text.
 
 const kShapes = {
-  lantern: "M12 2.5v2 M8.5 8a3.5 3.5 0 0 1 7 0 M7.5 8h9 M9 8l-1.5 13h9L15 8 M8.3 14.5h7.4 M18.5 6.5 21 5.5 M5.5 6.5 3 5.5",
+  lighthouse: "M12 2.5v2 M8.5 8a3.5 3.5 0 0 1 7 0 M7.5 8h9 M9 8l-1.5 13h9L15 8 M8.3 14.5h7.4 M18.5 6.5 21 5.5 M5.5 6.5 3 5.5",
   snapshot:
     "M4.5 7.5h3L9 5h6l1.5 2.5h3A1.5 1.5 0 0 1 21 9v8.5a1.5 1.5 0 0 1-1.5 1.5h-15A1.5 1.5 0 0 1 3 17.5V9a1.5 1.5 0 0 1 1.5-1.5Z " +
     "M15.5 13a3.5 3.5 0 1 1-7 0a3.5 3.5 0 0 1 7 0",

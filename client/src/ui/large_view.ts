@@ -53,7 +53,7 @@ export class LargeView {
     this.root = element("section", { class: "large", "aria-label": camera.name }, bar, this.#picture.root);
     document.addEventListener("visibilitychange", this.#follow);
     this.#playIfSeen();
-    this.#showState();
+    this.#picture.refresh();
   }
 
   focus(): void {

@@ -15,7 +15,7 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
   const form = element(
     "form",
     { class: "login-form", method: "post" },
-    element("div", { class: "brand" }, icon("lantern"), element("h1", {}, "Lookhaven")),
+    element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven")),
     account.row,
     password.row,
     message,

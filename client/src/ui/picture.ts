@@ -28,7 +28,7 @@ export class Picture {
   #rateSinceMs = performance.now();
   #framesPerSecond = 0;
 
-  /** `changed` is called after the state on the screen changed. */
+  /** `changed` is called after the state on the screen changed; call `refresh` once when you are ready for it. */
   constructor(camera: Camera, changed: () => void) {
     this.#camera = camera;
     this.#changed = changed;
@@ -49,7 +49,6 @@ export class Picture {
       this.#reason,
     );
     this.root = element("div", { class: "picture" }, this.canvas, message);
-    this.refresh();
   }
 
   state(): PictureState {

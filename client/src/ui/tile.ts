@@ -49,7 +49,7 @@ export class Tile {
       bar.append(iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"));
     }
     this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, this.#open, bar);
-    this.#showState();
+    this.picture.refresh();
   }
 
   set mode(mode: TileMode) {

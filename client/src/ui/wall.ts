@@ -77,7 +77,7 @@ export class Wall {
 
   #bar(account: Account): HTMLElement {
     const logout = iconButton("logout", `Log out ${account.account}`, () => void this.#logout());
-    const brand = element("div", { class: "brand" }, icon("lantern"), element("h1", {}, "Lookhaven"));
+    const brand = element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven"));
     return element("header", { class: "bar" }, brand, this.#count, this.#layoutPicker(), this.#clock, logout);
   }
 
@@ -101,18 +101,13 @@ export class Wall {
   }
 
   async #load(): Promise<void> {
-    try {
-      const list = await this.#server.cameras();
-      if (this.#closed) return;
-      this.#showList(list);
-      this.#trouble = "";
-    } catch (error) {
-      this.#trouble = error instanceof ServerError ? error.message : "The list of cameras cannot be read.";
-      if (!this.#cameras) this.#showMessage("warning", this.#trouble, true);
-    } finally {
-      this.#progress.hidden = true;
-      this.#refresh();
-    }
+    const list = await this.#server.cameras().catch((error: ServerError) => error);
+    if (this.#closed) return;
+    this.#trouble = list instanceof ServerError ? list.message : "";
+    this.#progress.hidden = true;
+    if (!(list instanceof ServerError)) this.#showList(list);
+    else if (!this.#cameras) this.#showMessage("warning", list.message, true);
+    this.#refresh();
   }
 
   #showList(list: CameraList): void {

@@ -64,7 +64,7 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
     case 401:
       return "You are not logged in.";
     case 429:
-      return "Too many attempts. Wait a minute, then try again.";
+      return "Too many attempts. Please wait a minute.";
     case 503:
       return "The server is busy.";
     case 504:
