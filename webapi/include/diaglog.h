@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Diagnostic lines: always written for errors, else only when the debug-log configuration asks for category and level.
+//
+// Why so        Streams trace each frame. A line that nobody asked for must cost two comparisons, so the filter is a macro
+//               and a line's arguments are evaluated only after it.
+// Thread safety Any thread.
+#pragma once
+
+#include "platform/log/dbglogcfg.h"
+#include "platform/log/lhprintf.h"
+
+// True when the configuration has a threshold for this very process and level is not above it.
+bool ChkPidLevel(LOG_LEVEL level);
+
+// The name of a category or level, "unknown" for a value without one. Lives as long as the process.
+template <typename T>
+const char* Enum2String(T value);
+extern template const char* Enum2String(LOG_CATEG);
+extern template const char* Enum2String(LOG_LEVEL);
+
+// True when a line of the category and level is to be written.
+inline bool IsLogAdmitted(LOG_CATEG categ, LOG_LEVEL level) {
+    return (g_pDbgLogCfg != nullptr && g_pDbgLogCfg->m_CategLevel[categ] >= level) || ChkPidLevel(level);
+}
+
+// An unconditional line. source: a name without extension; then a printf format and its arguments.
+#define LH_LOG(source, ...) LH_LOG_AT(source, __LINE__, __func__, __VA_ARGS__)
+// The same under the line number and function that the log's readers know it by.
+#define LH_LOG_AT(source, line, func, ...) LHPrintf(LOG_TYPE_DEFAULT, nullptr, nullptr, source, line, func, __VA_ARGS__)
+
+// A filtered line; no argument behind level is evaluated when it is not admitted.
+#define LH_TRACE(categ, level, source, ...) LH_TRACE_AT(categ, level, source, __LINE__, __func__, __VA_ARGS__)
+#define LH_TRACE_AT(categ, level, source, line, func, ...)                                                             \
+    do {                                                                                                               \
+        if (IsLogAdmitted(categ, level)) {                                                                             \
+            LHPrintf(LOG_TYPE_DEFAULT, Enum2String<LOG_CATEG>(categ), Enum2String<LOG_LEVEL>(level), source, line,     \
+                     func, __VA_ARGS__);                                                                               \
+        }                                                                                                              \
+    } while (false)
