@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Takes a container or an RTSP session apart into the frames of its first picture stream and its first sound stream.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "standalone/media/annexb.h"
+#include "standalone/media/libav.h"
+#include "standalone/media/packet.h"
+
+namespace lookhaven::media {
+
+class Demuxer {
+  public:
+    // The deadline must outlive the demuxer, which asks it in every wait. With analyse, reads ahead to learn what the
+    // container does not say. Throws SourceError.
+    Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, bool analyse);
+
+    const std::optional<StreamFormat>& Audio() const { return audio_; }
+
+    // The next frame, its time in the source's own microseconds, or nothing at the end. Frames before the first key
+    // frame and frames of no or too large a size are left out. Throws SourceError.
+    std::optional<Packet> Read();
+
+  private:
+    void ChooseVideo();
+    void ChooseAudio();
+    std::optional<Packet> Take();
+    std::optional<Packet> TakeVideo();
+    bool LearnFormat(std::span<const std::uint8_t> frame);
+
+    Deadline& deadline_;
+    AvPtr<AVFormatContext> input_;
+    AvPtr<AVPacket> packet_;
+    int video_index_ = -1;
+    int audio_index_ = -1;
+    AvPtr<AVBSFContext> video_filter_;
+    AvPtr<AVCodecContext> parser_codec_;
+    AvPtr<AVCodecParserContext> parser_;
+    std::optional<ParameterSets> parameter_sets_;
+    StreamFormat video_;
+    std::optional<StreamFormat> audio_;
+    std::int64_t last_time_us_ = 0;
+};
+
+}  // namespace lookhaven::media

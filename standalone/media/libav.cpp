@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/libav.h"
+
+#include <array>
+#include <mutex>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/media/source.h"
+#include "standalone/media/source_url.h"
+
+namespace lookhaven::media {
+
+namespace {
+
+void WriteAvLog(void* object, int level, const char* format, va_list arguments) {
+    if (level > AV_LOG_WARNING) {
+        return;
+    }
+    std::array<char, 1024> line{};
+    int print_prefix = 1;
+    av_log_format_line2(object, level, format, arguments, line.data(), static_cast<int>(line.size()), &print_prefix);
+    base::Log(base::Severity::kDebug, RedactSecrets(line.data()));
+}
+
+}  // namespace
+
+int CheckAv(int result, std::string_view what) {
+    if (result < 0) {
+        std::array<char, AV_ERROR_MAX_STRING_SIZE> text{};
+        av_strerror(result, text.data(), text.size());
+        throw SourceError(std::string(what) + ": " + text.data());
+    }
+    return result;
+}
+
+void RedirectAvLog() {
+    static std::once_flag once;
+    std::call_once(once, [] { av_log_set_callback(WriteAvLog); });
+}
+
+Deadline::Deadline(std::stop_token stop, std::chrono::milliseconds limit)
+    : stop_(std::move(stop)),
+      limit_us_(std::chrono::microseconds(limit).count()) {
+    Rearm();
+}
+
+void Deadline::Rearm() {
+    due_us_ = base::MonotonicMicros() + limit_us_;
+}
+
+bool Deadline::IsPast() const {
+    return base::MonotonicMicros() > due_us_;
+}
+
+void Deadline::Check() const {
+    if (stop_.stop_requested()) {
+        throw SourceError("stopped");
+    }
+    if (IsPast()) {
+        throw SourceError("no picture for " + std::to_string(limit_us_ / 1000) + " ms");
+    }
+}
+
+AVIOInterruptCB Deadline::Callback() {
+    return {[](void* self) {
+                const auto& deadline = *static_cast<const Deadline*>(self);
+                return deadline.stop_.stop_requested() || deadline.IsPast() ? 1 : 0;
+            },
+            this};
+}
+
+}  // namespace lookhaven::media

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// libav objects that free themselves, its errors as exceptions, its log in ours.
+#pragma once
+
+#include <chrono>
+#include <memory>
+#include <stop_token>
+#include <string>
+#include <string_view>
+
+extern "C" {
+#include <libavcodec/avcodec.h>
+#include <libavcodec/bsf.h>
+#include <libavformat/avformat.h>
+}
+
+namespace lookhaven::media {
+
+struct AvDeleter {
+    void operator()(AVFormatContext* context) const { avformat_close_input(&context); }
+    void operator()(AVIOContext* context) const { avio_closep(&context); }
+    void operator()(AVCodecContext* context) const { avcodec_free_context(&context); }
+    void operator()(AVBSFContext* context) const { av_bsf_free(&context); }
+    void operator()(AVCodecParserContext* parser) const { av_parser_close(parser); }
+    void operator()(AVPacket* packet) const { av_packet_free(&packet); }
+    void operator()(AVFrame* frame) const { av_frame_free(&frame); }
+};
+
+template <class T>
+using AvPtr = std::unique_ptr<T, AvDeleter>;
+
+// A dictionary of options as libav wants it: it takes out what it understands.
+class AvOptions {
+  public:
+    AvOptions() = default;
+    AvOptions(const AvOptions&) = delete;
+    AvOptions& operator=(const AvOptions&) = delete;
+    ~AvOptions() { av_dict_free(&dictionary_); }
+
+    AvOptions& Set(const char* key, const std::string& value) {
+        av_dict_set(&dictionary_, key, value.c_str(), 0);
+        return *this;
+    }
+    AVDictionary** Get() { return &dictionary_; }
+
+  private:
+    AVDictionary* dictionary_ = nullptr;
+};
+
+// Throws SourceError "<what>: <libav's text>" when the result of a libav call is negative; else returns it.
+int CheckAv(int result, std::string_view what);
+
+// Throws std::bad_alloc for null; else the object, owned.
+template <class T>
+AvPtr<T> OwnAv(T* object) {
+    if (object == nullptr) {
+        throw std::bad_alloc();
+    }
+    return AvPtr<T>(object);
+}
+
+// Sends libav's log lines to ours, at debug level and with secrets taken out: whatever matters comes back as an error
+// too, and a broken camera would fill the log with a line per frame. Does its work once per process.
+void RedirectAvLog();
+
+// Ends a blocking libav call at a stop request or when no picture came for too long.
+//
+// Why so        libav's own time-outs cover single reads, so a camera that sends a little now and then, or sound only,
+//               would hold a reader for ever; and the error code of an interrupted call does not say why it ended.
+class Deadline {
+  public:
+    Deadline(std::stop_token stop, std::chrono::milliseconds limit);
+    Deadline(const Deadline&) = delete;
+    Deadline& operator=(const Deadline&) = delete;
+
+    // A picture came: the limit counts from now.
+    void Rearm();
+
+    // Throws SourceError when stop was requested or the limit has passed.
+    void Check() const;
+
+    // The callback borrows this object for as long as libav holds it.
+    AVIOInterruptCB Callback();
+
+    const std::stop_token& Stop() const { return stop_; }
+
+  private:
+    bool IsPast() const;
+
+    std::stop_token stop_;
+    std::int64_t limit_us_;
+    std::int64_t due_us_ = 0;
+};
+
+}  // namespace lookhaven::media

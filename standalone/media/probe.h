@@ -1,0 +1,23 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Finds out what a source sends.
+#pragma once
+
+#include <chrono>
+#include <optional>
+#include <string>
+
+#include "standalone/media/source.h"
+
+namespace lookhaven::media {
+
+struct ProbeResult {
+    StreamFormat video;
+    double frames_per_second = 0;  // measured over the first second or so
+    std::optional<StreamFormat> audio;
+};
+
+// Opens the source and watches a few frames. Throws SourceError when no picture comes within the limit.
+ProbeResult ProbeSource(const std::string& url, const Credentials& credentials, std::chrono::milliseconds limit);
+
+}  // namespace lookhaven::media

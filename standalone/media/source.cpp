@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/source.h"
+
+#include <csignal>
+
+#include "standalone/media/libav.h"
+#include "standalone/media/source_kinds.h"
+#include "standalone/media/source_url.h"
+
+namespace lookhaven::media {
+
+namespace {
+
+// Threads that libav starts meanwhile inherit the blocked mask, so that signals reach only threads that expect them.
+class BlockedSignals {
+  public:
+    BlockedSignals() {
+        sigset_t all;
+        sigfillset(&all);
+        pthread_sigmask(SIG_SETMASK, &all, &before_);
+    }
+    BlockedSignals(const BlockedSignals&) = delete;
+    BlockedSignals& operator=(const BlockedSignals&) = delete;
+    ~BlockedSignals() { pthread_sigmask(SIG_SETMASK, &before_, nullptr); }
+
+  private:
+    sigset_t before_{};
+};
+
+std::unique_ptr<Source> Open(const std::string& url, const SourceOptions& options, std::stop_token stop) {
+    const std::string scheme = UrlScheme(url);
+    const std::string rest = url.substr(std::min(scheme.size() + 1, url.size()));
+    if (scheme == "rtsp") {
+        return OpenRtsp(url, options, std::move(stop));
+    }
+    if (scheme == "http" || scheme == "https") {
+        return OpenMjpegHttp(url, options, std::move(stop));
+    }
+    if (scheme == "file") {
+        return OpenFileLoop(rest.starts_with("///") ? rest.substr(2) : rest, options, std::move(stop));
+    }
+    if (scheme == "test") {
+        return OpenPattern(rest, std::move(stop));
+    }
+    throw SourceError("is no source that is known (rtsp, http, https, file, test)");
+}
+
+}  // namespace
+
+const char* CodecName(Codec codec) {
+    switch (codec) {
+    case Codec::kMjpeg:
+        return "MJPEG";
+    case Codec::kH264:
+        return "H264";
+    case Codec::kH265:
+        return "H265";
+    case Codec::kAac:
+        return "AAC";
+    case Codec::kPcmMulaw:
+        return "PCMU";
+    case Codec::kPcmAlaw:
+        return "PCMA";
+    case Codec::kOpus:
+        return "OPUS";
+    }
+    return "";
+}
+
+std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop) {
+    RedirectAvLog();
+    const BlockedSignals blocked;
+    return Open(url, options, std::move(stop));
+}
+
+}  // namespace lookhaven::media

@@ -1,0 +1,99 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/source_url.h"
+
+#include <cctype>
+#include <charconv>
+
+namespace lookhaven::media {
+
+namespace {
+
+constexpr std::size_t kMaxUserInfoChars = 127;  // libav's RTSP client keeps 128 bytes
+
+std::string PercentEncode(std::string_view text) {
+    constexpr char kHex[] = "0123456789ABCDEF";
+    std::string encoded;
+    for (const char c : text) {
+        const auto byte = static_cast<unsigned char>(c);
+        if (std::isalnum(byte) != 0 || c == '-' || c == '.' || c == '_' || c == '~' || c == '!' || c == '*') {
+            encoded += c;
+        } else {
+            encoded += {'%', kHex[byte >> 4], kHex[byte & 15]};
+        }
+    }
+    return encoded;
+}
+
+std::string PercentDecode(std::string_view text) {
+    std::string decoded;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        unsigned int byte = 0;
+        if (text[i] == '%' && i + 2 < text.size() &&
+            std::from_chars(&text[i + 1], &text[i + 1] + 2, byte, 16).ptr == &text[i + 1] + 2) {
+            decoded += static_cast<char>(byte);
+            i += 2;
+        } else {
+            decoded += text[i] == '+' ? ' ' : text[i];
+        }
+    }
+    return decoded;
+}
+
+}  // namespace
+
+std::string UrlScheme(std::string_view url) {
+    std::string scheme(url.substr(0, url.find(':') == url.npos ? 0 : url.find(':')));
+    for (char& c : scheme) {
+        c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+    }
+    return scheme;
+}
+
+std::string WithCredentials(const std::string& url, const Credentials& credentials) {
+    const std::size_t host = url.find("://");
+    if (host == url.npos || (credentials.user.empty() && credentials.password.empty())) {
+        return url;
+    }
+    const std::string user_info = PercentEncode(credentials.user) + ':' + PercentEncode(credentials.password);
+    if (user_info.size() > kMaxUserInfoChars) {
+        throw SourceError("the camera's user name and password are too long together");
+    }
+    return url.substr(0, host + 3) + user_info + '@' + url.substr(host + 3);
+}
+
+std::string RedactSecrets(std::string_view text) {
+    std::string redacted;
+    for (;;) {
+        const std::size_t mark = text.find("://");
+        if (mark == text.npos) {
+            return redacted.append(text);
+        }
+        redacted.append(text.substr(0, mark + 3));
+        text.remove_prefix(mark + 3);
+        const std::string_view url = text.substr(0, text.find_first_of(" \t\r\n'\""));
+        text.remove_prefix(url.size());
+        // The last '@' counts: an unencoded password may hold others, and slashes too.
+        const std::size_t at = url.rfind('@');
+        const std::size_t host = at == url.npos ? 0 : at + 1;
+        const std::size_t query = std::min(url.find('?', host), url.size());
+        redacted += at == url.npos ? "" : "…@";
+        redacted += url.substr(host, query - host);
+        redacted += query < url.size() ? "?…" : "";
+    }
+}
+
+PatternUrl ParsePatternUrl(std::string_view text) {
+    PatternUrl url;
+    url.name = text.substr(0, text.find('?'));
+    text.remove_prefix(std::min(url.name.size() + 1, text.size()));
+    while (!text.empty()) {
+        const std::string_view pair = text.substr(0, text.find('&'));
+        text.remove_prefix(std::min(pair.size() + 1, text.size()));
+        const std::size_t equals = std::min(pair.find('='), pair.size());
+        url.parameters[std::string(pair.substr(0, equals))] =
+            PercentDecode(pair.substr(std::min(equals + 1, pair.size())));
+    }
+    return url;
+}
+
+}  // namespace lookhaven::media
