@@ -20,6 +20,7 @@ import "./style/large.css";
 import "./style/snapshot.css";
 import { element } from "./ui/dom";
 import { loginScreen } from "./ui/login";
+import { hideNotice } from "./ui/notice";
 import { Wall } from "./ui/wall";
 import { Server, ServerError, type Account } from "./wire/server";
 
@@ -33,6 +34,7 @@ function showLogin(hint: string): void {
   if (wall === null && app.querySelector(".login")) return;
   wall?.close();
   wall = null;
+  hideNotice();
   app.replaceChildren(loginScreen(server, hint, showWallOf));
   app.querySelector("input")?.focus();
 }

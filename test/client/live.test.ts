@@ -157,6 +157,7 @@ test.each([
   ["else the usual one, and at once the next time", [null], 504, [1, null, null]],
   ["both fail: the small one first again", [], 504, [1, null, 1, null]],
   ["no second request to a server that does not answer", [], 0, [1, 1]],
+  ["nor to a busy one", [], 503, [1, 1]],
   ["nor without a session", [], 401, [1, 1]],
 ])("profiles of a small tile, run twice: %s", async (_name, working, status, asked) => {
   vi.stubGlobal("createImageBitmap", async () => ({ close: () => undefined }));

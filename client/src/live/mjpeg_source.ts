@@ -15,6 +15,8 @@ import type { Frame, LiveSource } from "./source";
 const kSmallProfile = 1;
 /** Longer than the server takes to find out that a camera is silent. */
 const kSilenceLimitMs = 25_000;
+/** No answer, no session, too busy: failures that another profile would meet as well. */
+const kNotTheProfile = [0, 401, 503];
 
 /** Reads capture time and age of a part; a part without them counts as captured on arrival. */
 export function captureOf(headers: ReadonlyMap<string, string>, nowMs: number): { capturedMs: number; ageMs: number } {
@@ -71,8 +73,8 @@ export class MjpegSource implements LiveSource {
     const count = () => (pictures += 1);
     if (trySmall) {
       const failure = await this.#stream(kSmallProfile, show, count, signal).catch((error: ServerError) => error);
-      const cameraAnswers = !(failure instanceof ServerError) || (failure.status !== 0 && failure.status !== 401);
-      if (pictures > 0 || signal.aborted || !cameraAnswers) {
+      const hopeless = failure instanceof ServerError && kNotTheProfile.includes(failure.status);
+      if (pictures > 0 || signal.aborted || hopeless) {
         if (failure instanceof ServerError) throw failure;
         return;
       }

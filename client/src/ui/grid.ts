@@ -18,6 +18,9 @@ const kSettleMs = 120;
 /** A picture drawn wider than this gains from more pixels than the small profile has. */
 const kSmallPictureLimitPx = 800;
 
+/** A tile of which less shows at the edge of the screen needs no picture. */
+const kSeenPart = 0.1;
+
 const kSteps: Record<string, (columns: number) => number> = {
   ArrowLeft: () => -1,
   ArrowRight: () => 1,
@@ -47,9 +50,8 @@ export class Grid {
   constructor(server: Server, actions: TileActions) {
     this.#server = server;
     this.#actions = actions;
-    const [page] = performance.getEntriesByType("navigation") as PerformanceNavigationTiming[];
-    this.#limit = streamLimit(page?.nextHopProtocol);
-    this.#observer = new IntersectionObserver((entries) => this.#see(entries), { root: this.root });
+    this.#limit = streamLimit(protocol());
+    this.#observer = new IntersectionObserver((entries) => this.#see(entries), { root: this.root, threshold: kSeenPart });
     this.#resized.observe(this.root);
     document.addEventListener("visibilitychange", this.#assignSoon);
     this.root.addEventListener("keydown", (event) => this.#onKey(event));
@@ -118,7 +120,7 @@ export class Grid {
   #see(entries: IntersectionObserverEntry[]): void {
     for (const entry of entries) {
       const id = Number((entry.target as HTMLElement).dataset["camera"]);
-      if (entry.isIntersecting) this.#visible.add(id);
+      if (entry.intersectionRatio >= kSeenPart) this.#visible.add(id);
       else this.#visible.delete(id);
     }
     this.#assignSoon();
@@ -165,6 +167,12 @@ export class Grid {
     const tiles = this.#inOrder();
     tiles[tiles.indexOf(current) + step(this.#columns)]?.focus();
   }
+}
+
+/** How the page and what it loaded came; a page out of the browser's cache may not know. */
+function protocol(): string | undefined {
+  const loaded = [...performance.getEntriesByType("navigation"), ...performance.getEntriesByType("resource")];
+  return (loaded as PerformanceResourceTiming[]).find(({ nextHopProtocol }) => nextHopProtocol !== "")?.nextHopProtocol;
 }
 
 function same(one: Camera, other: Camera): boolean {

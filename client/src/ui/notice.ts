@@ -14,5 +14,9 @@ export function notify(message: string): void {
   box.textContent = message;
   box.classList.add("shown");
   clearTimeout(timer);
-  timer = setTimeout(() => box.classList.remove("shown"), kShownMs);
+  timer = setTimeout(hideNotice, kShownMs);
+}
+
+export function hideNotice(): void {
+  box.classList.remove("shown");
 }

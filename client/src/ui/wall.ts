@@ -115,6 +115,7 @@ export class Wall {
     this.#grid.setCameras(this.#cameras);
     if (this.#cameras.length > 0) this.#message.replaceChildren();
     else if (list.CamNum > 0) this.#showMessage("camera", "No camera is switched on.", false);
+    else if (list.isManager) this.#showMessage("camera", "No camera yet. “lookhaven camera add” on the server adds one.", false);
     else this.#showMessage("camera", "There is no camera for you to see yet.", false);
     this.#followRoute();
   }

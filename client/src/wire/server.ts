@@ -70,7 +70,8 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
     case 504:
       return "The camera sends no picture.";
     default:
-      return serverMessage || (status < 400 ? "The server refused." : `The server could not answer (${status}).`);
+      if (status >= 500) return `The server could not answer (${status}).`;
+      return serverMessage ? `The server refused: ${serverMessage}.` : "The server refused.";
   }
 }
 
@@ -151,7 +152,9 @@ export class Server {
     const answer = await fetch(address("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters), { signal });
     if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
     if (answer.status === 401) this.#onSessionEnd();
-    throw await failureOf(answer);
+    const failure = await failureOf(answer);
+    // For a camera that cannot be opened the host says that its handler gave no answer, which nobody would understand.
+    throw failure.status === 502 ? new ServerError(502, failure.code, "No picture came.") : failure;
   }
 
   async #call<Data>(
