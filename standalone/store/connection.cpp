@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/connection.h"
+
+#include <string_view>
+
+#include <soci/postgresql/soci-postgresql.h>
+#include <soci/sqlite3/soci-sqlite3.h>
+
+#include "standalone/store/users.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+constexpr std::string_view kSqlitePrefix = "sqlite:";
+constexpr std::string_view kPostgresqlPrefix = "postgresql:";
+
+// How long a writer waits for another one.
+constexpr const char* kBusyTimeoutS = "5";
+
+}  // namespace
+
+StoreAddress StoreAddress::Parse(const std::string& url) {
+    if (url.starts_with("postgresql://")) {
+        return {Engine::kPostgresql, url};
+    }
+    if (url.starts_with(kPostgresqlPrefix)) {
+        return {Engine::kPostgresql, url.substr(kPostgresqlPrefix.size())};
+    }
+    if (url.starts_with(kSqlitePrefix) && url.size() > kSqlitePrefix.size()) {
+        std::string path = url.substr(kSqlitePrefix.size());
+        if (path.find_first_of("\"\n") != std::string::npos) {
+            throw StoreError("the store's path must not hold quotes or line breaks");
+        }
+        return {Engine::kSqlite, std::move(path)};
+    }
+    throw StoreError("the store's address must begin with sqlite: or postgresql:");
+}
+
+Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
+    try {
+        if (engine_ == Engine::kSqlite) {
+            session_.open(soci::sqlite3, "db=\"" + address.location + "\" timeout=" + kBusyTimeoutS);
+            session_ << "pragma foreign_keys = on";
+        } else {
+            session_.open(soci::postgresql, address.location);
+        }
+    } catch (const soci::soci_error& error) {
+        throw StoreError("cannot open the record store: " + error.get_error_message());
+    }
+}
+
+bool Connection::HasTable(const std::string& name) {
+    return Read([&](soci::session& sql) {
+        int found = 0;
+        sql << (IsSqlite()
+                    ? "select count(*) from sqlite_master where type = 'table' and name = :name"
+                    : "select count(*) from pg_tables where schemaname = current_schema() and tablename = :name"),
+            soci::use(name, "name"), soci::into(found);
+        return found > 0;
+    });
+}
+
+// SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the time-out,
+// when somebody wrote in between.
+Connection::Transaction::Transaction(Connection& connection) : session_(connection.session_) {
+    session_ << (connection.IsSqlite() ? "begin immediate" : "begin");
+}
+
+void Connection::Transaction::Commit() {
+    session_ << "commit";
+    open_ = false;
+}
+
+Connection::Transaction::~Transaction() {
+    if (!open_) {
+        return;
+    }
+    try {
+        session_ << "rollback";
+    } catch (const soci::soci_error&) {
+        // The connection is gone, and the transaction with it.
+    }
+}
+
+int NextId(soci::session& sql, const std::string& counter) {
+    int id = 0;
+    sql << "update counters set value = case when name = 'user' and value + 1 = :reserved then value + 2"
+           " else value + 1 end where name = :counter returning value",
+        soci::use(kPeerUserId, "reserved"), soci::use(counter, "counter"), soci::into(id);
+    return id;
+}
+
+void RaiseRevision(soci::session& sql) {
+    sql << "update counters set value = value + 1 where name = 'revision'";
+}
+
+void LockSchema(Connection& connection, soci::session& sql) {
+    if (!connection.IsSqlite()) {
+        sql << "select pg_advisory_xact_lock(19528)";
+    }
+}
+
+}  // namespace lookhaven::store

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The steps that lead from an empty store to this program's schema, the same for both engines.
+//
+// Invariants    (1) A step that was ever released is never changed; a new need is a new step at the end.
+//               (2) Columns are never null, so that no reader has to ask.
+#pragma once
+
+#include <span>
+#include <string_view>
+
+namespace lookhaven::store {
+
+struct Migration {
+    std::string_view purpose;
+    std::span<const char* const> statements;
+};
+
+// Step n leads to version n + 1.
+std::span<const Migration> Migrations();
+
+}  // namespace lookhaven::store

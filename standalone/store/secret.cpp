@@ -1,0 +1,67 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/secret.h"
+
+#include <array>
+#include <new>
+#include <stdexcept>
+#include <vector>
+
+#include <sodium.h>
+
+namespace lookhaven::store {
+
+namespace {
+
+// Of a password that nobody knows. A literal, since making one at the first unknown name would take twice as long as a
+// look at a known one, and so tell them apart.
+constexpr const char* kNobodysHash =
+    "$argon2id$v=19$m=65536,t=2,p=1$hV8m1iLSluiSrYIMrSKeag$DXWqEsUIys7oW/dbZ40036DcKkJgYYcDjGgiiJ9xt5g";
+
+void InitialiseSodium() {
+    if (sodium_init() < 0) {
+        throw std::runtime_error("the cryptographic library does not start");
+    }
+}
+
+std::string Hex(const unsigned char* bytes, std::size_t size) {
+    std::string text(2 * size + 1, '\0');
+    sodium_bin2hex(text.data(), text.size(), bytes, size);
+    text.pop_back();
+    return text;
+}
+
+}  // namespace
+
+std::string HashPassword(std::string_view password) {
+    InitialiseSodium();
+    std::array<char, crypto_pwhash_STRBYTES> hash{};
+    if (crypto_pwhash_str(hash.data(), password.data(), password.size(), crypto_pwhash_OPSLIMIT_INTERACTIVE,
+                          crypto_pwhash_MEMLIMIT_INTERACTIVE) != 0) {
+        throw std::bad_alloc();
+    }
+    return hash.data();
+}
+
+bool PasswordMatches(const std::optional<std::string>& hash, std::string_view password) {
+    InitialiseSodium();
+    const char* expected = hash ? hash->c_str() : kNobodysHash;
+    const bool matches = crypto_pwhash_str_verify(expected, password.data(), password.size()) == 0;
+    return hash && matches;
+}
+
+std::string RandomHex(std::size_t size_bytes) {
+    InitialiseSodium();
+    std::vector<unsigned char> bytes(size_bytes);
+    randombytes_buf(bytes.data(), bytes.size());
+    return Hex(bytes.data(), bytes.size());
+}
+
+std::string Digest(std::string_view text) {
+    InitialiseSodium();
+    std::array<unsigned char, 32> digest{};
+    crypto_generichash(digest.data(), digest.size(), reinterpret_cast<const unsigned char*>(text.data()), text.size(),
+                       nullptr, 0);
+    return Hex(digest.data(), digest.size());
+}
+
+}  // namespace lookhaven::store

@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Passwords and tokens, on libsodium.
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace lookhaven::store {
+
+// argon2id with salt and costs inside the text. Throws std::bad_alloc when 64 MiB are not to be had.
+std::string HashPassword(std::string_view password);
+
+// No hash: the answer is no, at the price of a real look.
+bool PasswordMatches(const std::optional<std::string>& hash, std::string_view password);
+
+// That many bytes from the operating system's generator, two hex digits each.
+std::string RandomHex(std::size_t size_bytes);
+
+// BLAKE2b-256, 64 hex digits.
+std::string Digest(std::string_view text);
+
+}  // namespace lookhaven::store

@@ -1,0 +1,145 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/store.h"
+
+#include <filesystem>
+#include <utility>
+
+#include <fcntl.h>
+
+#include "standalone/base/file.h"
+#include "standalone/store/connection.h"
+#include "standalone/store/schema.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+// 0 for a store without a schema.
+int ReadVersion(Connection& connection) {
+    if (!connection.HasTable("schema_version")) {
+        return 0;
+    }
+    return connection.Read([](soci::session& sql) {
+        int version = 0;
+        sql << "select version from schema_version", soci::into(version);
+        return version;
+    });
+}
+
+[[noreturn]] void ThrowNewer(int version) {
+    throw SchemaError("the record store has schema " + std::to_string(version) + ", newer than this program's " +
+                      std::to_string(Store::SchemaVersion()) + ": update Lookhaven on this host");
+}
+
+void CheckVersion(Connection& connection) {
+    const int version = ReadVersion(connection);
+    if (version > Store::SchemaVersion()) {
+        ThrowNewer(version);
+    }
+    if (version == 0) {
+        throw SchemaError("the record store is not set up yet: run lookhaven init");
+    }
+    if (version < Store::SchemaVersion()) {
+        throw SchemaError("the record store has schema " + std::to_string(version) + ", this program needs " +
+                          std::to_string(Store::SchemaVersion()) + ": run lookhaven init");
+    }
+}
+
+// SQLite's write-ahead log takes its mode from the file, so a private file keeps all of them private.
+void PrepareFile(const StoreAddress& address) {
+    if (address.engine != Engine::kSqlite) {
+        return;
+    }
+    try {
+        base::OpenFile(address.location, O_RDWR | O_CREAT, 0600);
+    } catch (const std::system_error& error) {
+        throw StoreError(error.what());
+    }
+    Connection(address).Read([](soci::session& sql) {
+        std::string mode;
+        sql << "pragma journal_mode = wal", soci::into(mode);
+        if (mode != "wal") {
+            throw StoreError("the record store's folder does not allow a write-ahead log: use a local file system");
+        }
+    });
+}
+
+int TakeSteps(soci::session& sql, int version) {
+    if (version == 0) {
+        sql << "create table schema_version (version integer not null)";
+        sql << "insert into schema_version (version) values (0)";
+    }
+    int steps = 0;
+    for (const Migration& migration : Migrations().subspan(static_cast<std::size_t>(version))) {
+        for (const char* statement : migration.statements) {
+            sql << statement;
+        }
+        ++steps;
+    }
+    const int reached = version + steps;
+    sql << "update schema_version set version = :version", soci::use(reached, "version");
+    return steps;
+}
+
+}  // namespace
+
+Store::Store(std::unique_ptr<Connection> connection) : connection_(std::move(connection)) {}
+Store::Store(Store&&) noexcept = default;
+Store& Store::operator=(Store&&) noexcept = default;
+Store::~Store() = default;
+
+int Store::SchemaVersion() {
+    return static_cast<int>(Migrations().size());
+}
+
+Store Store::Open(const std::string& url) {
+    const StoreAddress address = StoreAddress::Parse(url);
+    if (address.engine == Engine::kSqlite && !std::filesystem::exists(address.location)) {
+        throw SchemaError("there is no record store at " + address.location + ": run lookhaven init");
+    }
+    auto connection = std::make_unique<Connection>(address);
+    CheckVersion(*connection);
+    return Store(std::move(connection));
+}
+
+int Store::Migrate(const std::string& url) {
+    const StoreAddress address = StoreAddress::Parse(url);
+    PrepareFile(address);
+    Connection connection(address);
+    return connection.Write([&](soci::session& sql) {
+        LockSchema(connection, sql);
+        const int version = ReadVersion(connection);
+        if (version > SchemaVersion()) {
+            ThrowNewer(version);
+        }
+        return version == SchemaVersion() ? 0 : TakeSteps(sql, version);
+    });
+}
+
+std::vector<std::string> Store::Check() {
+    return connection_->Read([this](soci::session& sql) {
+        std::vector<std::string> findings;
+        std::string text;
+        if (connection_->IsSqlite()) {
+            soci::statement check = (sql.prepare << "pragma integrity_check", soci::into(text));
+            check.execute();
+            while (check.fetch()) {
+                if (text != "ok") {
+                    findings.push_back("the record store is damaged: " + text + "; restore it from a backup");
+                }
+            }
+        }
+        int camera = 0;
+        soci::statement lame = (sql.prepare << "select id from cameras where not exists (select 1 from camera_profiles"
+                                               " where camera_id = cameras.id and number = live_profile) order by id",
+                                soci::into(camera));
+        lame.execute();
+        while (lame.fetch()) {
+            findings.push_back("camera " + std::to_string(camera) +
+                               " has no source for its live view: set one with lookhaven camera set");
+        }
+        return findings;
+    });
+}
+
+}  // namespace lookhaven::store

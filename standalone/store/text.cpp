@@ -1,0 +1,94 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/text.h"
+
+#include <algorithm>
+#include <cstdint>
+
+#include <strings.h>
+
+namespace lookhaven::store {
+
+namespace {
+
+constexpr std::string_view kReservedName = "Lookhaven";
+constexpr std::size_t kMaxNameBytes = 64;
+constexpr std::size_t kMaxSourceBytes = 2048;
+
+bool IsAsciiLetterOrDigit(char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
+}
+
+// Takes one character off the front; a negative value for bytes that are none. Refuses overlong forms and surrogates.
+std::int32_t NextCharacter(std::string_view& text) {
+    const auto lead = static_cast<unsigned char>(text.front());
+    const int length = lead < 0x80 ? 1 : (lead >> 5) == 6 ? 2 : (lead >> 4) == 14 ? 3 : (lead >> 3) == 30 ? 4 : 0;
+    if (length == 0 || text.size() < static_cast<std::size_t>(length)) {
+        return -1;
+    }
+    std::int32_t value = length == 1 ? lead : lead & (0x7f >> length);
+    for (int i = 1; i < length; ++i) {
+        const auto byte = static_cast<unsigned char>(text[static_cast<std::size_t>(i)]);
+        if ((byte >> 6) != 2) {
+            return -1;
+        }
+        value = (value << 6) | (byte & 0x3f);
+    }
+    text.remove_prefix(static_cast<std::size_t>(length));
+    constexpr std::int32_t kLeast[] = {0, 0, 0x80, 0x800, 0x10000};
+    const bool surrogate = value >= 0xd800 && value <= 0xdfff;
+    return value < kLeast[length] || value > 0x10ffff || surrogate ? -1 : value;
+}
+
+bool HasHostWithoutUser(std::string_view rest) {
+    const std::string_view authority = rest.substr(0, rest.find_first_of("/?#"));
+    return !authority.empty() && authority.find('@') == std::string_view::npos;
+}
+
+}  // namespace
+
+bool IsPlainText(std::string_view text, std::size_t max_bytes) {
+    if (text.size() > max_bytes) {
+        return false;
+    }
+    while (!text.empty()) {
+        const std::int32_t c = NextCharacter(text);
+        if (c < 0x20 || (c >= 0x7f && c < 0xa0)) {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool IsReservedName(std::string_view name) {
+    return name.size() == kReservedName.size() &&
+           ::strncasecmp(name.data(), kReservedName.data(), kReservedName.size()) == 0;
+}
+
+bool IsAccountName(std::string_view name) {
+    return !name.empty() && name.size() <= kMaxNameBytes && IsAsciiLetterOrDigit(name.front()) &&
+           std::all_of(
+               name.begin(), name.end(),
+               [](char c) { return IsAsciiLetterOrDigit(c) || c == '.' || c == '_' || c == '-' || c == '@'; }) &&
+           !IsReservedName(name);
+}
+
+bool IsSource(std::string_view source) {
+    if (!IsPlainText(source, kMaxSourceBytes)) {
+        return false;
+    }
+    for (const std::string_view scheme : {"rtsp://", "http://", "https://"}) {
+        if (source.starts_with(scheme)) {
+            return source.find_first_of(" \\") == std::string_view::npos &&
+                   HasHostWithoutUser(source.substr(scheme.size()));
+        }
+    }
+    return (source.starts_with("file:") || source.starts_with("test:")) && source.size() > 5;
+}
+
+bool IsHex(std::string_view text, std::size_t digits) {
+    return text.size() == digits && std::all_of(text.begin(), text.end(), [](char c) {
+               return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f');
+           });
+}
+
+}  // namespace lookhaven::store

@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What text may go into a record; both engines take all that passes here.
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+namespace lookhaven::store {
+
+// Valid UTF-8 of at most that many bytes, without control characters. Empty text is plain.
+bool IsPlainText(std::string_view text, std::size_t max_bytes);
+
+// 1 to 64 ASCII letters, digits, ".", "_", "-", "@", the first a letter or digit, and not the reserved name.
+bool IsAccountName(std::string_view name);
+
+// The host's own name in the module's admission check: an account of that name would pass it.
+bool IsReservedName(std::string_view name);
+
+// An address that a camera's stream may come from, without account and password inside.
+bool IsSource(std::string_view source);
+
+bool IsHex(std::string_view text, std::size_t digits);
+
+}  // namespace lookhaven::store

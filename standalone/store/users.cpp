@@ -1,0 +1,172 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/users.h"
+
+#include "standalone/store/connection.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/text.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+constexpr std::size_t kMinPasswordBytes = 8;
+constexpr std::size_t kMaxPasswordBytes = 1024;
+
+void RequireName(std::string_view name) {
+    if (IsReservedName(name)) {
+        throw InvalidRecord("the account name \"" + std::string(name) + "\" is reserved");
+    }
+    if (!IsAccountName(name)) {
+        throw InvalidRecord(
+            "an account name is 1 to 64 letters, digits, '.', '_', '-', '@', the first a letter or digit");
+    }
+}
+
+void RequirePassword(std::string_view password) {
+    if (password.size() < kMinPasswordBytes || password.size() > kMaxPasswordBytes) {
+        throw InvalidRecord("a password has 8 to 1024 bytes");
+    }
+}
+
+// Also locks the row against a concurrent removal, where there are row locks.
+void RequireUser(soci::session& sql, int id) {
+    int found = 0;
+    sql << "update users set privilege = privilege where id = :id returning id", soci::use(id, "id"), soci::into(found);
+    if (!sql.got_data()) {
+        throw NotFound("there is no account " + std::to_string(id));
+    }
+}
+
+void EndSessions(soci::session& sql, int user_id) {
+    sql << "delete from sessions where user_id = :user", soci::use(user_id, "user");
+}
+
+std::optional<User> FetchOne(soci::session& sql, const std::string& condition, auto value) {
+    User user;
+    int privilege = 0;
+    sql << "select id, name, privilege from users where " + condition, soci::use(value, "value"), soci::into(user.id),
+        soci::into(user.name), soci::into(privilege);
+    user.privilege = static_cast<Privilege>(privilege);
+    return sql.got_data() ? std::optional(user) : std::nullopt;
+}
+
+}  // namespace
+
+User Users::Add(std::string_view name, std::string_view password, Privilege privilege) {
+    RequireName(name);
+    RequirePassword(password);
+    const std::string hash = HashPassword(password);
+    return connection_.Write([&](soci::session& sql) {
+        User user{NextId(sql, "user"), std::string(name), privilege};
+        if (FetchOne(sql, "lower(name) = lower(:value)", user.name)) {
+            throw AlreadyExists("there is already an account \"" + user.name + "\"");
+        }
+        const int level = static_cast<int>(privilege);
+        sql << "insert into users (id, name, password_hash, privilege) values (:id, :name, :hash, :privilege)",
+            soci::use(user.id, "id"), soci::use(user.name, "name"), soci::use(hash, "hash"),
+            soci::use(level, "privilege");
+        return user;
+    });
+}
+
+std::optional<User> Users::CheckPassword(std::string_view name, std::string_view password) {
+    const std::optional<User> user = FindByName(name);
+    std::optional<std::string> hash;
+    if (user) {
+        connection_.Read([&](soci::session& sql) {
+            std::string stored;
+            sql << "select password_hash from users where id = :id", soci::use(user->id, "id"), soci::into(stored);
+            if (sql.got_data()) {
+                hash = stored;
+            }
+        });
+    }
+    return PasswordMatches(hash, password.substr(0, kMaxPasswordBytes + 1)) ? user : std::nullopt;
+}
+
+std::optional<User> Users::Find(int id) {
+    return connection_.Read([&](soci::session& sql) { return FetchOne(sql, "id = :value", id); });
+}
+
+std::optional<User> Users::FindByName(std::string_view name) {
+    if (!IsAccountName(name)) {
+        return std::nullopt;
+    }
+    return connection_.Read(
+        [&](soci::session& sql) { return FetchOne(sql, "lower(name) = lower(:value)", std::string(name)); });
+}
+
+std::vector<User> Users::List() {
+    return connection_.Read([](soci::session& sql) {
+        std::vector<User> users;
+        User user;
+        int privilege = 0;
+        soci::statement rows = (sql.prepare << "select id, name, privilege from users order by id", soci::into(user.id),
+                                soci::into(user.name), soci::into(privilege));
+        rows.execute();
+        while (rows.fetch()) {
+            user.privilege = static_cast<Privilege>(privilege);
+            users.push_back(user);
+        }
+        return users;
+    });
+}
+
+void Users::SetPassword(int id, std::string_view password) {
+    RequirePassword(password);
+    const std::string hash = HashPassword(password);
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        sql << "update users set password_hash = :hash where id = :id", soci::use(hash, "hash"), soci::use(id, "id");
+        EndSessions(sql, id);
+    });
+}
+
+void Users::Deny(int id, int camera_id, std::initializer_list<CameraAccess> kinds) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        for (const CameraAccess kind : kinds) {
+            const int access = static_cast<int>(kind);
+            sql << "insert into denied_cameras (user_id, camera_id, access) values (:user, :camera, :access)"
+                   " on conflict do nothing",
+                soci::use(id, "user"), soci::use(camera_id, "camera"), soci::use(access, "access");
+        }
+        EndSessions(sql, id);
+    });
+}
+
+void Users::Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        for (const CameraAccess kind : kinds) {
+            const int access = static_cast<int>(kind);
+            sql << "delete from denied_cameras where user_id = :user and camera_id = :camera and access = :access",
+                soci::use(id, "user"), soci::use(camera_id, "camera"), soci::use(access, "access");
+        }
+    });
+}
+
+void Users::Remove(int id) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        sql << "delete from users where id = :id", soci::use(id, "id");
+    });
+}
+
+std::set<int> Users::DeniedCameras(int id, CameraAccess kind) {
+    return connection_.Read([&](soci::session& sql) {
+        std::set<int> cameras;
+        int camera = 0;
+        const int access = static_cast<int>(kind);
+        soci::statement rows =
+            (sql.prepare << "select camera_id from denied_cameras where user_id = :user and access = :access",
+             soci::use(id, "user"), soci::use(access, "access"), soci::into(camera));
+        rows.execute();
+        while (rows.fetch()) {
+            cameras.insert(camera);
+        }
+        return cameras;
+    });
+}
+
+}  // namespace lookhaven::store
