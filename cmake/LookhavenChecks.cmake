@@ -1,0 +1,23 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# Target check_headers: compiles each header of the tree by itself, twice included, so that none leans on its users.
+file(GLOB_RECURSE lookhaven_headers RELATIVE ${CMAKE_SOURCE_DIR} CONFIGURE_DEPENDS
+    webapi/*.h player/*.h platform/*.h standalone/*.h test/*.h bench/*.h)
+if(NOT LOOKHAVEN_TESTS)
+    list(FILTER lookhaven_headers EXCLUDE REGEX "^test/")
+endif()
+
+set(lookhaven_header_sources)
+foreach(header IN LISTS lookhaven_headers)
+    set(source ${CMAKE_BINARY_DIR}/check_headers/${header}.cpp)
+    file(CONFIGURE OUTPUT ${source} CONTENT "#include \"${header}\"\n#include \"${header}\"\n" @ONLY)
+    list(APPEND lookhaven_header_sources ${source})
+endforeach()
+
+add_library(check_headers OBJECT EXCLUDE_FROM_ALL ${lookhaven_header_sources})
+target_link_libraries(check_headers PRIVATE lookhaven_options lookhaven_platform lookhaven_soci
+    PkgConfig::jsoncpp PkgConfig::sodium PkgConfig::turbojpeg PkgConfig::libav CLI11::CLI11 Threads::Threads)
+if(LOOKHAVEN_TESTS)
+    pkg_check_modules(gst_rtsp_server REQUIRED IMPORTED_TARGET gstreamer-rtsp-server-1.0)
+    target_link_libraries(check_headers PRIVATE GTest::gmock PkgConfig::gst_rtsp_server)
+endif()
