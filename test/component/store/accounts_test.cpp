@@ -1,0 +1,238 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Accounts, sessions and the slow-down of guessing.
+#include <atomic>
+#include <chrono>
+
+#include "standalone/store/login_throttle.h"
+#include "standalone/store/sessions.h"
+#include "standalone/store/users.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::StartsWith;
+
+constexpr std::int64_t kNow = 4'000'000'000;  // beyond 31 bits
+constexpr std::int64_t kHour = 3600;
+const std::string kPassword = "correct horse";
+
+class AccountTest : public StoreTest {
+  protected:
+    Users users_{store_};
+    Sessions sessions_{store_};
+};
+
+TEST_P(AccountTest, NamesThatCouldMisleadAreRefused) {
+    for (const char* name : {"a", "Bob.Smith-2_x@example.org", "0", "lookhaven2"}) {
+        EXPECT_EQ(users_.Add(name, kPassword, Privilege::kViewer).name, name);
+    }
+    for (const char* name : {"Lookhaven", "LOOKHAVEN", ".a", "-a", "a b", "a/b", "a\"b", "ünder", "a<b>", "a:b"}) {
+        EXPECT_THROW(users_.Add(name, kPassword, Privilege::kViewer), InvalidRecord) << name;
+    }
+    for (const std::string& name : kHostileTexts) {
+        EXPECT_THROW(users_.Add(name, kPassword, Privilege::kViewer), InvalidRecord) << name;
+        EXPECT_FALSE(users_.FindByName(name)) << name;
+    }
+    EXPECT_THROW(users_.Add("A", kPassword, Privilege::kOwner), AlreadyExists) << "differs in case alone";
+    EXPECT_EQ(users_.List().size(), 4U);
+}
+
+TEST_P(AccountTest, IdsAreNeverGivenAgainAndNeverThePeers) {
+    Force("update counters set value = 1022 where name = 'user'");
+    EXPECT_EQ(users_.Add("a", kPassword, Privilege::kViewer).id, 1023);
+    EXPECT_EQ(users_.Add("b", kPassword, Privilege::kViewer).id, 1025);
+    users_.Deny(1025, 7);
+    users_.Remove(1025);
+    EXPECT_EQ(users_.Add("b", kPassword, Privilege::kViewer).id, 1026);
+    EXPECT_THAT(users_.DeniedCameras(1026, CameraAccess::kLive), IsEmpty()) << "a removed account's denials";
+    EXPECT_FALSE(users_.Find(1025));
+}
+
+TEST_P(AccountTest, OnlyTheRightPasswordLogsIn) {
+    const User bob = users_.Add("bob", kPassword, Privilege::kManager);
+    users_.Add("eve", std::string("nul\0inside", 10), Privilege::kViewer);
+    const struct {
+        std::string name, password;
+        bool admitted;
+    } rows[] = {
+        {"bob", kPassword, true},
+        {"BOB", kPassword, true},
+        {"bob", kPassword + " ", false},
+        {"bob", "", false},
+        {"bob", "CORRECT HORSE", false},
+        {"eve", "nul", false},
+        {"eve", std::string("nul\0inside", 10), true},
+        {"nobody", kPassword, false},
+        {"' or 1=1 --", kPassword, false},
+        {"bob", std::string(1'000'000, 'x'), false},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(users_.CheckPassword(row.name, row.password).has_value(), row.admitted) << row.name;
+    }
+    EXPECT_THAT(Ask("select password_hash from users where id = " + std::to_string(bob.id)),
+                StartsWith("$argon2id$v=19$m=65536,"));
+    EXPECT_THROW(users_.Add("short", "1234567", Privilege::kViewer), InvalidRecord);
+    EXPECT_THROW(users_.SetPassword(999, kPassword), NotFound);
+    users_.SetPassword(bob.id, "another one");
+    EXPECT_FALSE(users_.CheckPassword("bob", kPassword));
+    EXPECT_TRUE(users_.CheckPassword("bob", "another one"));
+}
+
+TEST_P(AccountTest, AnUnknownNameCostsAsMuchAsAWrongPassword) {
+    users_.Add("bob", kPassword, Privilege::kViewer);
+    const auto fastest = [&](const char* name) {
+        auto best = std::chrono::steady_clock::duration::max();
+        for (int i = 0; i < 5; ++i) {
+            const auto start = std::chrono::steady_clock::now();
+            users_.CheckPassword(name, "wrong password");
+            best = std::min(best, std::chrono::steady_clock::now() - start);
+        }
+        return best;
+    };
+    EXPECT_GT(fastest("nobody") * 3, fastest("bob") * 2);
+    EXPECT_GT(fastest("not a name") * 3, fastest("bob") * 2);
+}
+
+TEST_P(AccountTest, DenialsAreKeptPerKind) {
+    const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
+    users_.Deny(id, 2);
+    users_.Deny(id, 2, {CameraAccess::kAudio});
+    users_.Deny(id, 5, {CameraAccess::kAudio});
+    users_.Allow(id, 2, {CameraAccess::kPlayback});
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kLive), ElementsAre(2));
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kPlayback), IsEmpty());
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kAudio), ElementsAre(2, 5));
+    users_.Allow(id, 2);
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kAudio), ElementsAre(5));
+    EXPECT_THROW(users_.Deny(99, 2), NotFound);
+}
+
+TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
+    const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
+    const NewSession other = sessions_.Create(users_.Add("eve", kPassword, Privilege::kViewer).id, kNow);
+    const struct {
+        const char* change;
+        std::function<void()> make;
+        bool ends;
+    } rows[] = {
+        {"allow", [&] { users_.Allow(id, 2); }, false},
+        {"deny", [&] { users_.Deny(id, 2, {CameraAccess::kAudio}); }, true},
+        {"password", [&] { users_.SetPassword(id, "another one"); }, true},
+        {"end of user", [&] { EXPECT_EQ(sessions_.EndOfUser(id), 1); }, true},
+        {"removal", [&] { users_.Remove(id); }, true},
+    };
+    for (const auto& row : rows) {
+        sessions_.EndOfUser(id);
+        const NewSession session = sessions_.Create(id, kNow);
+        row.make();
+        EXPECT_EQ(sessions_.FindBySecret(session.secret, kNow).has_value(), !row.ends) << row.change;
+        EXPECT_EQ(sessions_.EndedAmong({session.handle, other.handle}, kNow).size(), row.ends ? 1U : 0U) << row.change;
+    }
+    EXPECT_TRUE(sessions_.FindBySecret(other.secret, kNow));
+    EXPECT_THROW(sessions_.Create(id, kNow), NotFound) << "the account is gone";
+}
+
+TEST_P(AccountTest, ASessionOpensBySecretAloneAndTheStoreDoesNotHoldIt) {
+    const User bob = users_.Add("bob", kPassword, Privilege::kManager);
+    const NewSession made = sessions_.Create(bob.id, kNow);
+    const auto found = sessions_.FindBySecret(made.secret, kNow);
+    ASSERT_TRUE(found);
+    EXPECT_EQ(found->handle, made.handle);
+    EXPECT_EQ(found->user.id, bob.id);
+    EXPECT_EQ(found->user.name, "bob");
+    EXPECT_TRUE(found->user.IsManager());
+    const std::string stored = Ask("select secret_hash from sessions");
+    EXPECT_NE(stored, made.secret);
+    for (const std::string& wrong : {stored, made.handle, made.secret.substr(1), made.secret + "0"}) {
+        EXPECT_FALSE(sessions_.FindBySecret(wrong, kNow)) << wrong;
+    }
+    for (const std::string& wrong : kHostileTexts) {
+        EXPECT_FALSE(sessions_.FindBySecret(wrong, kNow)) << wrong;
+        EXPECT_FALSE(sessions_.End(wrong)) << wrong;
+        EXPECT_EQ(sessions_.EndedAmong({wrong}, kNow).size(), 1U) << wrong;
+    }
+    const NewSession second = sessions_.Create(bob.id, kNow);
+    EXPECT_TRUE(sessions_.End(made.handle));
+    EXPECT_FALSE(sessions_.End(made.handle));
+    EXPECT_THAT(sessions_.EndedAmong({made.handle, second.handle}, kNow), ElementsAre(made.handle));
+}
+
+TEST_P(AccountTest, SessionsEndByIdlenessAndByAge) {
+    const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
+    const struct {
+        const char* use;
+        std::vector<std::int64_t> seen_after_s;
+        std::int64_t last_alive_s;
+    } rows[] = {
+        {"never used", {}, 12 * kHour - 1},
+        {"used once", {11 * kHour}, 23 * kHour - 1},
+        {"used within the minute", {59}, 12 * kHour - 1},
+        {"used daily", {11 * kHour, 22 * kHour, 33 * kHour, 44 * kHour}, 56 * kHour - 1},
+    };
+    for (const auto& row : rows) {
+        const NewSession made = sessions_.Create(id, kNow);
+        for (const std::int64_t seen : row.seen_after_s) {
+            const auto session = sessions_.FindBySecret(made.secret, kNow + seen);
+            ASSERT_TRUE(session) << row.use;
+            EXPECT_EQ(sessions_.Touch(*session, kNow + seen), seen >= 60) << row.use;
+            EXPECT_FALSE(sessions_.Touch(*session, kNow + seen)) << "written twice, by a stale reader too: " << row.use;
+        }
+        EXPECT_TRUE(sessions_.FindBySecret(made.secret, kNow + row.last_alive_s)) << row.use;
+        EXPECT_FALSE(sessions_.FindBySecret(made.secret, kNow + row.last_alive_s + 1)) << row.use;
+        EXPECT_THAT(sessions_.EndedAmong({made.handle}, kNow + row.last_alive_s), IsEmpty()) << row.use;
+        EXPECT_THAT(sessions_.EndedAmong({made.handle}, kNow + row.last_alive_s + 1), ElementsAre(made.handle));
+        EXPECT_EQ(sessions_.PurgeExpired(kNow + row.last_alive_s), 0) << row.use;
+        EXPECT_EQ(sessions_.PurgeExpired(kNow + row.last_alive_s + 1), 1) << row.use;
+    }
+    const NewSession busy = sessions_.Create(id, kNow);
+    std::int64_t last_alive = 0;
+    for (std::int64_t t = 0; const auto session = sessions_.FindBySecret(busy.secret, kNow + t); t += 6 * kHour) {
+        sessions_.Touch(*session, kNow + t);
+        last_alive = t;
+    }
+    EXPECT_EQ(last_alive, 7 * 24 * kHour - 6 * kHour) << "a week, however busy";
+}
+
+TEST_P(AccountTest, GuessingIsSlowedDownPerAccountAndAddress) {
+    LoginThrottle throttle(store_);
+    const struct {
+        std::int64_t at_s;
+        const char* account;
+        const char* address;
+        int wait_s;
+    } rows[] = {
+        {0, "bob", "::1", 0},   {1, "bob", "::1", 0},   {2, "BOB", "::1", 0},       {3, "bob", "::1", 0},
+        {20, "bob", "::1", 0},  {21, "bob", "::1", 59}, {21, "bob", "10.0.0.1", 0}, {21, "eve", "::1", 0},
+        {79, "bob", "::1", 1},  {80, "bob", "::1", 0},  {81, "bob", "::1", 0},      {150, "bob", "::1", 0},
+        {151, "bob", "::1", 0}, {90, "bob", "::1", 0},  // the clock was set back
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(throttle.Enter(row.account, row.address, kNow + row.at_s), row.wait_s) << row.at_s << row.account;
+    }
+    for (int i = 0; i < 20; ++i) {
+        EXPECT_EQ(throttle.Enter("eve", "::1", kNow + 200), 0) << "right passwords do not add up";
+        throttle.Clear("eve", "::1");
+    }
+    for (const std::string& text : kHostileTexts) {
+        EXPECT_EQ(throttle.Enter(text, text, kNow + 300), 0);
+    }
+}
+
+TEST_P(AccountTest, GuessesAtOnceAreCountedEach) {
+    std::atomic<int> admitted = 0;
+    InParallel(8, [&](Store& store) {
+        for (int i = 0; i < 3; ++i) {
+            admitted += LoginThrottle(store).Enter("bob", "::1", kNow) == 0 ? 1 : 0;
+        }
+    });
+    EXPECT_EQ(admitted, 5);
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(AccountTest);
+
+}  // namespace
+}  // namespace lookhaven::store

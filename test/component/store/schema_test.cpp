@@ -1,0 +1,141 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Opening and setting up a store: from nothing, again, by several at once, and with what this program must not touch.
+#include <atomic>
+#include <fstream>
+
+#include <sys/stat.h>
+
+#include "standalone/store/cameras.h"
+#include "standalone/store/settings.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::AllOf;
+using testing::Each;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::Not;
+using testing::ThrowsMessage;
+
+TEST_P(EmptyStore, IsRefusedUntilItIsSetUpAndKeepsItsDataWhenSetUpAgain) {
+    EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("run lookhaven init")));
+    if (GetParam() == Engine::kSqlite) {
+        EXPECT_THAT(std::filesystem::directory_iterator(folder_), std::filesystem::directory_iterator())
+            << "opening creates nothing";
+    }
+    EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion());
+    {
+        Store store = Store::Open(url_);
+        Settings(store).Set("place", "Zürich");
+    }
+    EXPECT_EQ(Store::Migrate(url_), 0);
+    Store store = Store::Open(url_);
+    EXPECT_EQ(Settings(store).Find("place"), "Zürich");
+    EXPECT_THAT(store.Check(), IsEmpty());
+}
+
+TEST_P(EmptyStore, OfAnotherVersionIsRefusedWithTheWayOut) {
+    Store::Migrate(url_);
+    Force("update schema_version set version = 0");
+    EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("run lookhaven init")));
+    Force("update schema_version set version = 99");
+    EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
+    EXPECT_THAT([&] { Store::Migrate(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
+    EXPECT_EQ(Ask("select version from schema_version"), "99");
+}
+
+TEST_P(EmptyStore, IsSetUpOnceByMany) {
+    std::atomic<int> steps = 0;
+    std::vector<std::string> failures(6);
+    std::vector<std::thread> threads;
+    for (std::string& failure : failures) {
+        threads.emplace_back([&] {
+            try {
+                steps += Store::Migrate(url_);
+            } catch (const std::exception& error) {
+                failure = error.what();
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_THAT(failures, Each(""));
+    EXPECT_EQ(steps, Store::SchemaVersion());
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(EmptyStore);
+
+TEST_P(StoreTest, CheckNamesACameraWithoutALiveSource) {
+    Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+    EXPECT_THAT(store_.Check(), IsEmpty());
+    Force("delete from camera_profiles");
+    EXPECT_THAT(store_.Check(), ElementsAre(HasSubstr("camera 1")));
+}
+
+TEST_P(StoreTest, WritersOnSeveralConnectionsLoseNothing) {
+    const std::int64_t before = Settings(store_).Revision();
+    InParallel(4, [](Store& store) {
+        for (int i = 0; i < 25; ++i) {
+            Cameras(store).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+            Settings(store).Set("last", std::to_string(i));
+        }
+    });
+    EXPECT_EQ(Settings(store_).Revision() - before, 4 * 25 * 2);
+    EXPECT_EQ(Cameras(store_).List().back().id, 100) << "each writer got ids of its own";
+}
+
+TEST_P(StoreTest, HostileTextIsRefusedOrKeptExactly) {
+    Settings settings(store_);
+    for (const std::string& text : kHostileTexts) {
+        EXPECT_EQ(settings.Find(text), std::nullopt) << text;
+        try {
+            settings.Set("hostile", text);
+        } catch (const InvalidRecord&) {
+            continue;
+        }
+        EXPECT_EQ(settings.Find("hostile"), text);
+    }
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(StoreTest);
+
+class SqliteTest : public EmptyStore {};
+
+TEST_P(SqliteTest, FilesArePrivateWhateverTheMask) {
+    const mode_t mask = ::umask(0);
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    Settings(store).Set("a", "b");
+    ::umask(mask);
+    int files = 0;
+    for (const auto& file : std::filesystem::directory_iterator(folder_)) {
+        EXPECT_EQ(file.status().permissions(), std::filesystem::perms(0600)) << file;
+        ++files;
+    }
+    EXPECT_EQ(files, 3) << "database, log and index";
+}
+
+TEST_P(SqliteTest, WhatIsNoStoreIsAnErrorAndStaysAsItIs) {
+    const std::string text(8192, 'x');
+    std::ofstream(folder_ / "lookhaven.db") << text;
+    std::filesystem::create_directory(folder_ / "folder");
+    const std::string folder = folder_.string();
+    for (const std::string& url :
+         {url_, "sqlite:" + folder + "/folder", "sqlite:" + folder + "/no/such", "sqlite:" + folder + "/a\"b",
+          std::string("sqlite:"), std::string(""), std::string("mysql://host/db"),
+          std::string("postgresql:host=/nowhere"), folder + "/lookhaven.db"}) {
+        EXPECT_THROW(Store::Open(url), StoreError) << url;
+        EXPECT_THROW(Store::Migrate(url), StoreError) << url;
+    }
+    EXPECT_EQ(std::filesystem::file_size(folder_ / "lookhaven.db"), text.size());
+}
+
+INSTANTIATE_TEST_SUITE_P(, SqliteTest, testing::Values(Engine::kSqlite), EngineName);
+
+}  // namespace
+}  // namespace lookhaven::store

@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Gives each test an empty store of its own, on either engine.
+#pragma once
+
+#include <filesystem>
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "standalone/store/connection.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+class EmptyStore : public testing::TestWithParam<Engine> {
+  protected:
+    EmptyStore();
+    ~EmptyStore() override;
+
+    // Looks or reaches behind the records' interface.
+    std::string Ask(const std::string& query);
+    void Force(const std::string& statement);
+
+    std::filesystem::path folder_;
+    std::string url_;
+};
+
+class StoreTest : public EmptyStore {
+  protected:
+    StoreTest() : store_((Store::Migrate(url_), Store::Open(url_))) {}
+
+    // Runs the work at once on so many connections; a failure in any of them fails the test.
+    void InParallel(int connections, const std::function<void(Store&)>& work);
+
+    Store store_;
+};
+
+// A text with zeros, quotes and bytes that are no UTF-8, as requests bring them.
+const std::vector<std::string> kHostileTexts = {"",
+                                                std::string("a\0b", 3),
+                                                "' or '1'='1",
+                                                "x'; drop table users; --",
+                                                "\xff\xfe",
+                                                "\xed\xa0\x80",
+                                                "\xc0\xaf",
+                                                "\n",
+                                                std::string(100'000, 'A'),
+                                                "%",
+                                                "\\",
+                                                ":name",
+                                                "$1"};
+
+std::string EngineName(const testing::TestParamInfo<Engine>& info);
+
+}  // namespace lookhaven::store
+
+#define LOOKHAVEN_ON_BOTH_ENGINES(suite)                                                                               \
+    INSTANTIATE_TEST_SUITE_P(, suite, testing::Values(Engine::kSqlite, Engine::kPostgresql), EngineName)
