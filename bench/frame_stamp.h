@@ -3,6 +3,7 @@
 // A time stamp inside a picture: it travels untouched from the ring to the viewer.
 #pragma once
 
+#include <algorithm>
 #include <array>
 #include <cstdint>
 #include <cstdio>
