@@ -1,0 +1,97 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Serves the built client and cameras that do what a test wants, over HTTP/1.1 with the strictest policy.
+
+import { execFileSync } from "node:child_process";
+import { existsSync, mkdtempSync, readFileSync, rmSync } from "node:fs";
+import { createServer, type IncomingMessage, type ServerResponse } from "node:http";
+import type { AddressInfo } from "node:net";
+import { tmpdir } from "node:os";
+import { extname, join } from "node:path";
+
+const kPolicy = "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
+  "frame-ancestors 'none'; require-trusted-types-for 'script'";
+const kTypes: Record<string, string> = { ".html": "text/html", ".js": "text/javascript", ".css": "text/css", ".svg": "image/svg+xml" };
+const kFrameMs = 50;
+
+export class FakeServer {
+  readonly cameras: { id: number; name: string; video_type: number }[] = [];
+  /** Cameras that keep their streams open and send nothing. */
+  readonly stalled = new Set<number>();
+  /** "camera/profile" of each stream that is open. */
+  readonly streams: string[] = [];
+  polls = 0;
+  mostPollsAtOnce = 0;
+  hasSession = false;
+  jpeg = Buffer.alloc(0);
+  readonly #files = mkdtempSync(join(tmpdir(), "lookhaven-client-"));
+  readonly #server = createServer((request, answer) => this.#answer(request, answer));
+  #pollsNow = 0;
+
+  async start(): Promise<string> {
+    const client = join(__dirname, "../../client");
+    const vite = ["node_modules/vite/bin/vite.js", "build", "--logLevel=error", "--emptyOutDir", `--outDir=${this.#files}`];
+    execFileSync(process.execPath, vite, { cwd: client, env: { ...process.env, NODE_ENV: "production" } });
+    await new Promise<void>((resolve) => this.#server.listen(0, "127.0.0.1", resolve));
+    return `http://127.0.0.1:${(this.#server.address() as AddressInfo).port}/`;
+  }
+
+  close(): void {
+    this.#server.close();
+    this.#server.closeAllConnections();
+    rmSync(this.#files, { recursive: true, force: true });
+  }
+
+  #answer(request: IncomingMessage, answer: ServerResponse): void {
+    const { pathname, searchParams } = new URL(request.url ?? "", "http://localhost");
+    if (pathname !== "/webapi") return this.#file(pathname === "/" ? "/index.html" : pathname, answer);
+    const method = searchParams.get("method");
+    if (method === "Login") this.hasSession = true;
+    if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
+    if (method === "Logout") this.hasSession = false;
+    if (method === "Play") return this.#play(searchParams, answer);
+    const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
+    const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
+    json(answer, 200, { success: true, data: method === "LoadCamera" ? list : { account: "admin", user_id: 1, is_manager: true } });
+  }
+
+  #file(path: string, answer: ServerResponse): void {
+    const file = join(this.#files, path);
+    if (!existsSync(file)) return void answer.writeHead(404).end();
+    answer.writeHead(200, { "Content-Type": kTypes[extname(path)], "Content-Security-Policy": kPolicy });
+    answer.end(readFileSync(file));
+  }
+
+  #play(parameters: URLSearchParams, answer: ServerResponse): void {
+    const id = Number(parameters.get("camera"));
+    if (parameters.get("snapshot") === "1") return this.#snapshot(answer);
+    const name = `${id}/${parameters.get("profileType") ?? "usual"}`;
+    this.streams.push(name);
+    answer.writeHead(200, { "Content-Type": "multipart/x-mixed-replace; boundary=b" }).write("--b\r\n");
+    const timer = setInterval(() => {
+      // A stream of an ended session ends, as the host has it.
+      if (!this.hasSession) return void answer.end();
+      if (this.stalled.has(id)) return;
+      const head = `Content-Length: ${this.jpeg.length}\r\nX-Capture-Time: ${Date.now() / 1000}\r\nX-Age-Ms: 1\r\n\r\n`;
+      answer.write(Buffer.concat([Buffer.from(head), this.jpeg, Buffer.from("\r\n--b\r\n")]));
+    }, kFrameMs);
+    answer.on("close", () => {
+      clearInterval(timer);
+      this.streams.splice(this.streams.indexOf(name), 1);
+    });
+  }
+
+  #snapshot(answer: ServerResponse): void {
+    this.polls += 1;
+    this.#pollsNow += 1;
+    this.mostPollsAtOnce = Math.max(this.mostPollsAtOnce, this.#pollsNow);
+    setTimeout(() => {
+      this.#pollsNow -= 1;
+      answer.writeHead(200, { "Content-Type": "image/jpeg" }).end(this.jpeg);
+    }, kFrameMs);
+  }
+}
+
+function json(answer: ServerResponse, status: number, body: unknown): void {
+  answer.writeHead(status, { "Content-Type": "application/json", "Cache-Control": "no-store" }).end(JSON.stringify(body));
+}
