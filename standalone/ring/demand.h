@@ -46,7 +46,7 @@ class Demand {
 
   private:
     struct Table;
-    Table& table() const;
+    Table& Shared() const;
 
     base::SharedMapping mapping_;
     std::uint32_t seen_ = 0;

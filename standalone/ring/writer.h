@@ -54,6 +54,8 @@ class Writer {
     // Says that the writer lives although no frame comes; Write does it by itself.
     void Beat();
 
+    // The attachment, for readers in this process; valid until the stream moves or ends.
+    void* Address() const;
     std::uint64_t DroppedFrames() const;
     Geometry CurrentGeometry() const;
 

@@ -1,0 +1,179 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The layout of a ring in shared memory, and how segments are found, made and checked.
+//
+// Format        | SegmentHead | ReaderSlot × kReaderSlots | IndexSlot × index_slots | arena |
+//               The arena is counted in blocks of kBlockBytes. An entry fills whole blocks: its 44-byte head, then its
+//               data. The entry with count c is described by index slot c % index_slots while that slot's count is c.
+//               Counts begin at 1 and never repeat; the sequence number is (c - 1) % 10001.
+//
+// Protocol      Writer, to reuse a region: sets the counts of the index slots that describe it to 0, then looks through
+//               the pins. Reader, to use an entry: reads its slot, stores the place as its pin, then reads the slot's
+//               count again. All of these are sequentially consistent, so of a writer and a reader that meet, the writer
+//               sees the pin, or the reader sees that the entry is gone. The writer goes round pinned regions.
+//
+// Invariants    (1) All but the changing part of the head is constant once magic is there.
+//               (2) A slot's place changes only while its count is 0, and no count is used twice.
+//               (3) A reader slot's pin belongs to its owner; a free slot has no pin.
+//
+// Crash rule    Every step leaves the segment valid. A segment without magic is unfinished, and nobody's once its creator
+//               is dead. A writer that dies between two steps leaves at worst an entry that the index does not name; the
+//               next writer takes every entry out of the index and begins behind the highest count. A reader that dies
+//               leaves a slot whose owner is dead; whoever finds it in the way frees it. Owners are one word of process
+//               id and start time, so owning and letting go is one store.
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <string>
+#include <utility>
+
+#include <sys/types.h>
+
+#include "standalone/ring/stream.h"
+
+namespace lookhaven::ring {
+
+constexpr std::uint64_t kMagic = 0x676e69526e76684cULL;  // "LhvnRing" in memory on little-endian machines
+constexpr std::uint32_t kLayoutVersion = 1;
+constexpr std::uint32_t kReaderSlots = 512;
+constexpr std::uint32_t kBlockBytes = 64;
+
+struct SegmentHead {
+    // The same in every layout version.
+    std::atomic<std::uint64_t> magic;
+    std::uint32_t layout_version;
+    std::uint32_t generation;  // differs between segments
+    std::uint64_t segment_bytes;
+    std::uint64_t installation;
+    std::int32_t camera;
+    std::int32_t stream;
+    std::int32_t medium;
+    // This layout's.
+    std::uint32_t reader_slots;
+    std::uint32_t index_slots;
+    std::uint32_t arena_blocks;
+    std::int32_t width;
+    std::int32_t height;
+    std::uint32_t every_frame_is_key;
+    std::uint32_t extra_length;
+    char codec[kMaxCodecLength + 1];
+    unsigned char extra_data[kMaxExtraBytes];
+    // Changing.
+    alignas(64) std::atomic<std::uint64_t> writer;  // process word, 0 when the stream has ended
+    std::atomic<std::uint64_t> index_of;  // the writer whose entries the index names; set once earlier ones are out
+    std::atomic<std::int64_t> heartbeat_micros;
+    std::atomic<std::uint64_t> newest;      // count of the newest entry, 0 when there was none
+    std::atomic<std::uint64_t> newest_key;  // count of the newest key frame of this run, 0 when there is none
+    std::atomic<std::uint64_t> dropped;
+    std::atomic<std::uint32_t> retired;
+    std::atomic<std::uint32_t> wake;  // futex word, changes with each entry
+};
+
+struct ReaderSlot {
+    std::atomic<std::uint64_t> owner;  // process word, 0 when free
+    std::atomic<std::uint64_t> pin;    // Place, 0 when nothing is pinned
+};
+
+struct IndexSlot {
+    std::atomic<std::uint64_t> count;  // 0 when the slot describes nothing
+    std::atomic<std::uint64_t> place;
+};
+static_assert(std::atomic<std::uint64_t>::is_always_lock_free, "segments are shared between processes");
+
+// A region of the arena, in blocks.
+struct Place {
+    std::uint32_t first = 0;
+    std::uint32_t blocks = 0;
+
+    std::uint64_t End() const { return std::uint64_t{first} + blocks; }
+    bool Overlaps(const Place& other) const { return first < other.End() && other.first < End(); }
+    std::uint64_t Word() const { return (std::uint64_t{blocks} << 32) | first; }
+    static Place FromWord(std::uint64_t word) {
+        return {static_cast<std::uint32_t>(word), static_cast<std::uint32_t>(word >> 32)};
+    }
+};
+
+constexpr std::int32_t SequenceOf(std::uint64_t count) {
+    return static_cast<std::int32_t>((count - 1) % (kLastSequence + 1));
+}
+
+// A checked segment at its address. Borrows the attachment.
+class View {
+  public:
+    explicit View(const void* address) : base_(static_cast<unsigned char*>(const_cast<void*>(address))) {}
+
+    SegmentHead& Head() const { return *reinterpret_cast<SegmentHead*>(base_); }
+    std::span<ReaderSlot> Readers() const;
+    IndexSlot& Slot(std::uint64_t count) const;
+    // Raw memory of the place, which must lie inside the arena.
+    unsigned char* Memory(const Place& place) const;
+    // The entry there, or null when place or entry is impossible. The caller has it pinned.
+    const Entry* EntryAt(const Place& place) const;
+    StreamId Id() const;
+    StreamFormat Format() const;
+    Geometry Size() const;
+
+  private:
+    unsigned char* base_;
+};
+
+// One attachment of a segment to this process.
+class Attachment {
+  public:
+    Attachment() = default;
+    // shmat; throws std::system_error. With read_only nothing may be written.
+    explicit Attachment(int shm_id, bool read_only = false);
+    Attachment(Attachment&& other) noexcept
+        : shm_id_(std::exchange(other.shm_id_, -1)),
+          address_(std::exchange(other.address_, nullptr)) {}
+    Attachment& operator=(Attachment&& other) noexcept;
+    ~Attachment();
+
+    void* Address() const { return address_; }
+    int ShmId() const { return shm_id_; }
+    explicit operator bool() const { return address_ != nullptr; }
+    // Hands the attachment to the caller, who detaches it.
+    void* Release();
+    // Takes the segment's name away: it vanishes with its last attachment.
+    void RemoveSegment() const;
+
+  private:
+    int shm_id_ = -1;
+    void* address_ = nullptr;
+};
+
+enum class SegmentCheck { kGood, kUnfinished, kNotARing, kOtherLayout, kDamaged };
+
+// Judges what lies at the address of an attachment that is real_bytes long.
+SegmentCheck CheckSegment(const void* address, std::uint64_t real_bytes);
+
+std::uint64_t SegmentBytes(const Geometry& geometry);
+
+// Keys of this system's segments share their highest byte.
+bool IsRingKey(key_t key);
+
+// Removes the segment if its creator was killed before the magic was written: nobody else ever would.
+bool RemoveIfAbandoned(int shm_id);
+
+// A segment with the stream's identity, as found; a retired one is passed over.
+struct FoundSegment {
+    Attachment attachment;
+    SegmentCheck check = SegmentCheck::kGood;
+};
+std::optional<FoundSegment> FindSegment(std::uint64_t installation, const StreamId& id);
+
+// Makes a segment that this process writes, with no entry in it. Throws std::system_error when memory or every key is
+// refused.
+Attachment CreateSegment(std::uint64_t installation, const StreamId& id, const StreamFormat& format,
+                         const Geometry& geometry);
+// The same without a name.
+Attachment CreatePrivateSegment(const StreamId& id, const StreamFormat& format, const Geometry& geometry);
+
+// The format as a segment keeps it: name cut at kMaxCodecLength, oversized extra data left out.
+StreamFormat Storable(StreamFormat format);
+
+}  // namespace lookhaven::ring
