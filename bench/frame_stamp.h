@@ -4,6 +4,7 @@
 #pragma once
 
 #include <algorithm>
+#include <algorithm>
 #include <array>
 #include <cstdint>
 #include <cstdio>
