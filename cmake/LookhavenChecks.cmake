@@ -1,7 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # Target check_headers: compiles each header of the tree by itself, twice included, so that none leans on its users.
-file(GLOB_RECURSE lookhaven_headers RELATIVE ${CMAKE_SOURCE_DIR} CONFIGURE_DEPENDS
+file(GLOB_RECURSE lookhaven_headers RELATIVE ${CMAKE_SOURCE_DIR}
     webapi/*.h player/*.h platform/*.h standalone/*.h test/*.h bench/*.h)
 if(NOT LOOKHAVEN_TESTS)
     list(FILTER lookhaven_headers EXCLUDE REGEX "^test/")
