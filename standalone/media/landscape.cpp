@@ -151,7 +151,7 @@ void DrawBars(Canvas& canvas, int width, int height, int bar_height_px) {
 
 Landscape DrawLandscape(int width, int height, int unit_px, std::string_view seed) {
     const std::uint32_t hash = Hash(seed);
-    const Palette& palette = kPalettes[(hash >> 8) % kPalettes.size()];
+    const Palette& palette = kPalettes[hash >> 30];
     Dice dice(hash);
     Canvas canvas(width, height);
     DrawSky(canvas, palette, width, height, unit_px, dice);

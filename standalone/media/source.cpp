@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/media/source.h"
 
-#include <csignal>
+#include <algorithm>
 
+#include "standalone/base/blocked_signals.h"
 #include "standalone/media/libav.h"
 #include "standalone/media/source_kinds.h"
 #include "standalone/media/source_url.h"
@@ -10,22 +11,6 @@
 namespace lookhaven::media {
 
 namespace {
-
-// Threads that libav starts meanwhile inherit the blocked mask, so that signals reach only threads that expect them.
-class BlockedSignals {
-  public:
-    BlockedSignals() {
-        sigset_t all;
-        sigfillset(&all);
-        pthread_sigmask(SIG_SETMASK, &all, &before_);
-    }
-    BlockedSignals(const BlockedSignals&) = delete;
-    BlockedSignals& operator=(const BlockedSignals&) = delete;
-    ~BlockedSignals() { pthread_sigmask(SIG_SETMASK, &before_, nullptr); }
-
-  private:
-    sigset_t before_{};
-};
 
 std::unique_ptr<Source> Open(const std::string& url, const SourceOptions& options, std::stop_token stop) {
     const std::string scheme = UrlScheme(url);
@@ -69,7 +54,7 @@ const char* CodecName(Codec codec) {
 
 std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop) {
     RedirectAvLog();
-    const BlockedSignals blocked;
+    const base::BlockedSignals blocked;  // for the threads that libav may start
     return Open(url, options, std::move(stop));
 }
 

@@ -33,6 +33,8 @@ class SourceError : public std::runtime_error {
 struct Credentials {
     std::string user;
     std::string password;
+
+    bool operator==(const Credentials&) const = default;
 };
 
 struct SourceOptions {

@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// lookhaven-recorder: takes the cameras' streams in and hands them on to viewers.
+#include <chrono>
+#include <csignal>
+#include <exception>
+#include <string>
+
+#include <sysexits.h>
+#include <unistd.h>
+
+#include <CLI/CLI.hpp>
+
+#include "standalone/base/installation.h"
+#include "standalone/base/log.h"
+#include "standalone/recorder/instance_lock.h"
+#include "standalone/recorder/supervisor.h"
+
+namespace {
+
+using namespace lookhaven;
+
+constexpr std::chrono::milliseconds kFinishLimit{1'500};
+
+volatile std::sig_atomic_t g_stop = 0;
+
+void StopOnSignals() {
+    struct sigaction action {};
+    action.sa_handler = [](int) { g_stop = 1; };
+    sigaction(SIGTERM, &action, nullptr);
+    sigaction(SIGINT, &action, nullptr);
+    std::signal(SIGPIPE, SIG_IGN);  // a camera's connection may break while it is written to
+}
+
+void RunUntilStopped(const base::Installation& installation, std::chrono::milliseconds no_data_limit) {
+    const recorder::InstanceLock lock(installation);
+    StopOnSignals();
+    recorder::Supervisor supervisor(installation, no_data_limit);
+    base::LogInfo("started for " + installation.Home().string());
+    while (g_stop == 0) {
+        supervisor.Step();
+    }
+    if (!supervisor.Finish(kFinishLimit)) {
+        base::LogWarning("stopped, though a camera's host name was still being looked up");
+        ::_exit(EX_OK);
+    }
+    base::LogInfo("stopped");
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    base::SetLogProgram("recorder");
+    CLI::App app("Takes the cameras' streams in and hands them on to viewers.", "lookhaven-recorder");
+    std::string home;
+    double no_data_limit_s = 10;
+    app.add_option("--home", home, "State folder; else LOOKHAVEN_HOME, else ./var");
+    app.add_option("--no-data-limit", no_data_limit_s, "Seconds without a picture after which a camera is tried anew")
+        ->check(CLI::Range(0.1, 600.0))
+        ->capture_default_str();
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        return app.exit(error) == 0 ? EX_OK : EX_USAGE;
+    }
+    try {
+        const base::Installation installation =
+            home.empty() ? base::Installation::FromEnvironment() : base::Installation(home);
+        RunUntilStopped(installation, std::chrono::milliseconds(static_cast<std::int64_t>(no_data_limit_s * 1000)));
+        return EX_OK;
+    } catch (const std::exception& failure) {
+        base::LogError(failure.what());
+        return EX_UNAVAILABLE;
+    }
+}

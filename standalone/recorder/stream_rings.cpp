@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/stream_rings.h"
+
+#include <algorithm>
+#include <bit>
+
+#include "standalone/base/clock.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+constexpr int kUsualFramesPerSecond = 25;
+constexpr std::int64_t kAudioBitsPerSecond = 128'000;
+
+ring::StreamFormat RingFormat(const media::StreamFormat& format) {
+    const bool is_video = format.width > 0;
+    return {media::CodecName(format.codec), format.extra_data, format.width, format.height,
+            !is_video || format.codec == media::Codec::kMjpeg};
+}
+
+// Goes by the picture's size more than by its contents, so that a restarted recorder comes to the same ring.
+ring::StreamEstimate VideoEstimate(const media::StreamFormat& format, std::size_t first_frame_bytes) {
+    const std::int64_t pixels = std::int64_t{format.width} * format.height;
+    const auto usual_bytes = static_cast<std::uint64_t>(pixels) / 8;
+    const auto frame_bytes =
+        static_cast<std::int64_t>(std::bit_ceil(std::max<std::uint64_t>(usual_bytes, first_frame_bytes)));
+    const bool is_mjpeg = format.codec == media::Codec::kMjpeg;
+    return {ring::Medium::kVideo, is_mjpeg, is_mjpeg ? frame_bytes * 8 * kUsualFramesPerSecond : pixels * 4,
+            frame_bytes, kUsualFramesPerSecond};
+}
+
+std::int64_t CaptureMillis(std::int64_t timestamp_us) {
+    const std::int64_t age_us = std::max<std::int64_t>(0, base::MonotonicMicros() - timestamp_us);
+    return base::WallMillis() - age_us / 1000;
+}
+
+}  // namespace
+
+void StreamRings::Write(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
+    const ring::Frame frame{packet.data, 0, packet.key_frame, packet.timestamp_us, CaptureMillis(packet.timestamp_us)};
+    if (packet.medium == media::Medium::kAudio) {
+        if (audio_) {
+            audio_->Write(frame);
+        }
+        return;
+    }
+    if (!video_format_ || *video_format_ != *packet.format) {
+        if (!video_format_) {
+            OpenAudio(audio, packet.format->codec);
+        }
+        Open(video_, ring::Medium::kVideo, RingFormat(*packet.format),
+             VideoEstimate(*packet.format, packet.data.size()));
+        video_format_ = *packet.format;
+    }
+    video_->Write(frame);
+}
+
+void StreamRings::EndRun() {
+    video_format_.reset();
+    for (std::optional<ring::Writer>* writer : {&video_, &audio_}) {
+        if (*writer) {
+            (*writer)->StartRun();
+        }
+    }
+}
+
+void StreamRings::Beat() {
+    for (std::optional<ring::Writer>* writer : {&video_, &audio_}) {
+        if (*writer) {
+            (*writer)->Beat();
+        }
+    }
+}
+
+void StreamRings::OpenAudio(const std::optional<media::StreamFormat>& audio, media::Codec video_codec) {
+    if (!audio && video_codec == media::Codec::kMjpeg) {
+        audio_.reset();
+        return;
+    }
+    ring::StreamFormat format = audio ? RingFormat(*audio) : ring::StreamFormat{};
+    format.every_frame_is_key = true;
+    Open(audio_, ring::Medium::kAudio, format, {ring::Medium::kAudio, true, kAudioBitsPerSecond, 0, 0});
+}
+
+void StreamRings::Open(std::optional<ring::Writer>& writer, ring::Medium medium, const ring::StreamFormat& format,
+                       const ring::StreamEstimate& estimate) {
+    if (writer) {
+        writer->SetFormat(format);
+        return;
+    }
+    writer.emplace(installation_, ring::StreamId{stream_.camera, stream_.stream, medium}, format,
+                   ring::GeometryFor(estimate));
+}
+
+}  // namespace lookhaven::recorder

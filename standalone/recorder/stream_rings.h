@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The rings of one live stream: pictures, and the sound that goes with them.
+//
+// Invariants    (1) The sound's ring exists before the first picture can be found, since viewers look for both. A
+//               stream of pictures other than MJPEG has one even when it is silent.
+//               (2) Both rings begin and end their runs together.
+// Thread safety One thread.
+#pragma once
+
+#include <optional>
+
+#include "standalone/base/installation.h"
+#include "standalone/media/packet.h"
+#include "standalone/ring/demand.h"
+#include "standalone/ring/writer.h"
+
+namespace lookhaven::recorder {
+
+class StreamRings {
+  public:
+    // Creates nothing yet. The installation must outlive this object.
+    StreamRings(const base::Installation& installation, ring::LiveStream stream)
+        : installation_(installation),
+          stream_(stream) {}
+
+    // Appends the packet; a packet of another format than before moves the stream to a new ring. The first packet of a
+    // run is a picture. audio is the format of the sound that goes with it. Throws std::exception when the rings
+    // cannot be made.
+    void Write(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
+
+    // The source failed: what it sent is old now, and no viewer finds it any more.
+    void EndRun();
+
+    // Says that the writer lives although no frame comes.
+    void Beat();
+
+  private:
+    void OpenAudio(const std::optional<media::StreamFormat>& audio, media::Codec video_codec);
+    void Open(std::optional<ring::Writer>& writer, ring::Medium medium, const ring::StreamFormat& format,
+              const ring::StreamEstimate& estimate);
+
+    const base::Installation& installation_;
+    ring::LiveStream stream_;
+    std::optional<ring::Writer> video_;
+    std::optional<ring::Writer> audio_;
+    std::optional<media::StreamFormat> video_format_;  // of this run
+};
+
+}  // namespace lookhaven::recorder

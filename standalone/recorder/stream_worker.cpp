@@ -1,0 +1,103 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/stream_worker.h"
+
+#include <algorithm>
+#include <exception>
+#include <memory>
+#include <utility>
+
+#include "standalone/base/blocked_signals.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/media/pace.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+std::string Title(ring::LiveStream stream, const StreamPlan& plan) {
+    return "camera " + std::to_string(stream.camera) + " \"" + plan.camera_name + "\" stream " +
+           std::to_string(stream.stream) + ": ";
+}
+
+}  // namespace
+
+StreamWorker::StreamWorker(const base::Installation& installation, ring::LiveStream stream, StreamPlan plan,
+                           std::chrono::milliseconds no_data_limit)
+    : installation_(installation),
+      stream_(stream),
+      plan_(std::move(plan)),
+      options_{plan_.credentials, no_data_limit},
+      backoff_(static_cast<std::uint32_t>(base::MonotonicMicros())) {
+    const base::BlockedSignals blocked;
+    thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
+}
+
+void StreamWorker::Run(const std::stop_token& stop) {
+    {
+        StreamRings rings(installation_, stream_);
+        while (!stop.stop_requested()) {
+            try {
+                Stream(rings, stop);
+            } catch (const std::exception& failure) {
+                if (!stop.stop_requested()) {
+                    ReportFailure(failure.what());
+                    rings.EndRun();
+                    WaitToTryAgain(rings, stop);
+                }
+            }
+        }
+    }
+    base::LogInfo(Title(stream_, plan_) + "stopped");
+    has_ended_ = true;
+}
+
+// Leaves by an exception only.
+void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
+    live_since_us_ = 0;
+    const std::unique_ptr<media::Source> source = media::OpenSource(plan_.url, options_, stop);
+    for (;;) {
+        const media::Packet packet = source->Next();
+        rings.Write(packet, source->Audio());
+        if (live_since_us_ == 0) {
+            live_since_us_ = base::MonotonicMicros();
+            ReportLive(*packet.format, source->Audio());
+        }
+    }
+}
+
+void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& stop) {
+    constexpr std::int64_t kBeatUs = 1'000'000;
+    const std::int64_t now_us = base::MonotonicMicros();
+    const std::chrono::microseconds flowed(live_since_us_ == 0 ? 0 : now_us - live_since_us_);
+    const std::chrono::microseconds wait =
+        backoff_.AfterFailure(std::chrono::duration_cast<std::chrono::milliseconds>(flowed));
+    const std::int64_t end_us = now_us + wait.count();
+    for (std::int64_t step_us = now_us; step_us < end_us;) {
+        rings.Beat();
+        step_us = std::min(step_us + kBeatUs, end_us);
+        if (!media::SleepUntil(step_us, stop)) {
+            return;
+        }
+    }
+}
+
+void StreamWorker::ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio) {
+    std::string text = Title(stream_, plan_) + "live, " + media::CodecName(video.codec) + ' ' +
+                       std::to_string(video.width) + 'x' + std::to_string(video.height);
+    if (audio) {
+        text += std::string(" with ") + media::CodecName(audio->codec);
+    }
+    base::LogInfo(text);
+    reported_failure_.clear();
+}
+
+// Once for each change, not once for each attempt.
+void StreamWorker::ReportFailure(const std::string& reason) {
+    if (reason != reported_failure_) {
+        base::LogWarning(Title(stream_, plan_) + reason + "; trying again");
+        reported_failure_ = reason;
+    }
+}
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Runs one live stream: reads its source and fills its rings, and tries again whenever the source fails.
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <cstdint>
+#include <optional>
+#include <stop_token>
+#include <string>
+#include <thread>
+
+#include "standalone/base/installation.h"
+#include "standalone/media/source.h"
+#include "standalone/recorder/backoff.h"
+#include "standalone/recorder/stream_rings.h"
+#include "standalone/ring/demand.h"
+
+namespace lookhaven::recorder {
+
+// Where a stream comes from.
+struct StreamPlan {
+    std::string camera_name;
+    std::string url;
+    media::Credentials credentials;
+
+    bool operator==(const StreamPlan&) const = default;
+};
+
+class StreamWorker {
+  public:
+    // Starts the stream's thread, which takes no signals. The installation must outlive the worker. Throws
+    // std::system_error when there is no thread to be had.
+    StreamWorker(const base::Installation& installation, ring::LiveStream stream, StreamPlan plan,
+                 std::chrono::milliseconds no_data_limit);
+
+    const StreamPlan& Plan() const { return plan_; }
+
+    // Asks the thread to end and does not wait for it; the rings are gone when it has.
+    void RequestStop() { thread_.request_stop(); }
+    // Once true, destruction does not wait.
+    bool HasEnded() const { return has_ended_; }
+
+  private:
+    void Run(const std::stop_token& stop);
+    void Stream(StreamRings& rings, const std::stop_token& stop);
+    void WaitToTryAgain(StreamRings& rings, const std::stop_token& stop);
+    void ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio);
+    void ReportFailure(const std::string& reason);
+
+    const base::Installation& installation_;
+    const ring::LiveStream stream_;
+    const StreamPlan plan_;
+    const media::SourceOptions options_;
+    Backoff backoff_;
+    std::int64_t live_since_us_ = 0;  // 0: not live
+    std::string reported_failure_;    // empty when the last report was another
+    std::atomic<bool> has_ended_ = false;
+    std::jthread thread_;  // last: it uses the others
+};
+
+}  // namespace lookhaven::recorder

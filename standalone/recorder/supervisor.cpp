@@ -1,0 +1,116 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/supervisor.h"
+
+#include <algorithm>
+#include <exception>
+#include <utility>
+#include <vector>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/media/pace.h"
+#include "standalone/ring/inventory.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+constexpr std::chrono::milliseconds kWhileSomeEnd{20};
+constexpr int kOrphanSearchSeconds = 60;
+
+}  // namespace
+
+Supervisor::Supervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit)
+    : installation_(installation),
+      no_data_limit_(no_data_limit),
+      demand_(installation),
+      common_config_(installation),
+      catalog_(installation.StoreUrl()) {
+    DoEverySecond();
+}
+
+void Supervisor::Step() {
+    demand_.WaitForDemand(TimeToNextStep());
+    if (base::MonotonicMicros() >= next_second_us_) {
+        DoEverySecond();
+    }
+    Reconcile();
+}
+
+bool Supervisor::Finish(std::chrono::milliseconds limit) {
+    for (const auto& [stream, worker] : workers_) {
+        worker->RequestStop();
+    }
+    const std::int64_t end_us = base::MonotonicMicros() + std::chrono::microseconds(limit).count();
+    while (DropEndedWorkers(), !workers_.empty()) {
+        const std::int64_t now_us = base::MonotonicMicros();
+        if (now_us >= end_us) {
+            return false;
+        }
+        media::SleepUntil(now_us + 5'000, {});
+    }
+    return true;
+}
+
+std::chrono::milliseconds Supervisor::TimeToNextStep() const {
+    const std::chrono::microseconds left(std::max<std::int64_t>(0, next_second_us_ - base::MonotonicMicros()));
+    const auto rounded_up = std::chrono::ceil<std::chrono::milliseconds>(left);
+    return some_end_ ? std::min(kWhileSomeEnd, rounded_up) : rounded_up;
+}
+
+void Supervisor::DoEverySecond() {
+    next_second_us_ = base::MonotonicMicros() + 1'000'000;
+    const bool refreshed = common_config_.Refresh(false);
+    if (refreshed != std::exchange(common_config_refreshed_, refreshed)) {
+        refreshed ? base::LogInfo("the common record is fresh again")
+                  : base::LogError("another process holds the common record's lock");
+    }
+    catalog_.Refresh();
+    if (seconds_++ % kOrphanSearchSeconds == 0) {
+        if (const std::size_t removed = ring::RemoveOrphans(installation_); removed > 0) {
+            base::LogInfo("removed " + std::to_string(removed) + " segments of a dead recorder");
+        }
+    }
+}
+
+void Supervisor::Reconcile() {
+    const std::vector<ring::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
+    std::map<ring::LiveStream, StreamPlan> plans;
+    for (const ring::LiveStream& stream : wanted) {
+        if (const auto plan = catalog_.Streams().find(stream); plan != catalog_.Streams().end()) {
+            plans.insert(*plan);
+        }
+    }
+    some_end_ = false;
+    for (const auto& [stream, worker] : workers_) {
+        const auto plan = plans.find(stream);
+        if (plan == plans.end() || plan->second != worker->Plan()) {
+            worker->RequestStop();
+            some_end_ = true;
+        }
+    }
+    DropEndedWorkers();
+    for (const auto& [stream, plan] : plans) {
+        if (!workers_.contains(stream)) {
+            Start(stream, plan);
+        }
+    }
+}
+
+void Supervisor::DropEndedWorkers() {
+    std::erase_if(workers_, [](const auto& entry) { return entry.second->HasEnded(); });
+}
+
+void Supervisor::Start(ring::LiveStream stream, const StreamPlan& plan) {
+    try {
+        workers_.emplace(stream, std::make_unique<StreamWorker>(installation_, stream, plan, no_data_limit_));
+        reported_failure_.clear();
+    } catch (const std::exception& failure) {
+        if (failure.what() != reported_failure_) {
+            reported_failure_ = failure.what();
+            base::LogError("cannot start camera " + std::to_string(stream.camera) + ": " + reported_failure_);
+        }
+    }
+}
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,56 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Keeps the set of running streams equal to the set of wanted ones.
+//
+// Why so        Starting and stopping a camera takes time, and may take long; so this thread only compares the two sets,
+//               again and again, and never waits for a worker.
+// Thread safety One thread.
+#pragma once
+
+#include <chrono>
+#include <map>
+#include <memory>
+#include <string>
+
+#include "standalone/base/installation.h"
+#include "standalone/recorder/catalog.h"
+#include "standalone/recorder/stream_worker.h"
+#include "standalone/ring/common_config.h"
+#include "standalone/ring/demand.h"
+
+namespace lookhaven::recorder {
+
+class Supervisor {
+  public:
+    // Removes what a dead recorder of this installation left. The installation must outlive the supervisor. Throws
+    // std::system_error when the shared tables cannot be made.
+    Supervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit);
+
+    // One pass: waits up to a second for something to do and does it. A signal cuts the wait.
+    void Step();
+
+    // Stops all streams. False when one of them did not end within the limit; the process must then leave without
+    // destroying the supervisor, which would wait for it.
+    bool Finish(std::chrono::milliseconds limit);
+
+  private:
+    void DoEverySecond();
+    void Reconcile();
+    void DropEndedWorkers();
+    void Start(ring::LiveStream stream, const StreamPlan& plan);
+    std::chrono::milliseconds TimeToNextStep() const;
+
+    const base::Installation& installation_;
+    std::chrono::milliseconds no_data_limit_;
+    ring::Demand demand_;
+    ring::CommonConfigKeeper common_config_;
+    Catalog catalog_;
+    std::map<ring::LiveStream, std::unique_ptr<StreamWorker>> workers_;
+    std::int64_t next_second_us_ = 0;
+    std::int64_t seconds_ = 0;
+    bool common_config_refreshed_ = true;
+    bool some_end_ = false;
+    std::string reported_failure_;
+};
+
+}  // namespace lookhaven::recorder
