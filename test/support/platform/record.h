@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// How the double's functions find their script and record themselves.
+#pragma once
+
+#include <sstream>
+
+#include "test/support/platform/scripted_platform.h"
+
+namespace lookhaven::test {
+
+inline ScriptedPlatform& Script() {
+    return *CurrentPlatform();
+}
+
+// JSON on one line.
+std::string Text(const Json::Value& value);
+
+// Records name(argument,argument…).
+template <typename... Arguments>
+void Call(const char* name, const Arguments&... arguments) {
+    std::ostringstream text;
+    [[maybe_unused]] const char* separator = "";
+    text << name << '(';
+    ((text << separator << arguments, separator = ","), ...);
+    text << ')';
+    Script().Record(text.str());
+}
+
+}  // namespace lookhaven::test

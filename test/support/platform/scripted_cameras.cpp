@@ -1,0 +1,152 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The platform's cameras, live streams and multipart output on a script.
+#include <cstdio>
+#include <cstring>
+
+#include "platform/camera/devcap.h"
+#include "platform/live/livestream.h"
+#include "platform/output/multipartresponse.h"
+#include "test/support/platform/record.h"
+
+using lookhaven::test::Call;
+using lookhaven::test::Script;
+using lookhaven::test::Sound;
+
+namespace lookhaven::test {
+
+Camera MakeCamera(int id, int video_type, bool enabled) {
+    Camera camera;
+    camera.m_Id = id;
+    std::snprintf(camera.m_szName, sizeof camera.m_szName, "cam%d", id);
+    camera.m_VideoType = video_type;
+    camera.m_blEnabled = enabled;
+    camera.m_LiveProfile = CAM_PROFILE_LOW;
+    return camera;
+}
+
+}  // namespace lookhaven::test
+
+Camera::Camera() {
+    std::memset(static_cast<void*>(this), 0, sizeof *this);
+}
+int Camera::Load(int camId, int serverId, int archiveId) {
+    Call("Load", camId, serverId, archiveId);
+    const auto found = Script().cameras.find(camId);
+    if (found == Script().cameras.end()) {
+        return -1;
+    }
+    *this = found->second;
+    return 0;
+}
+CAM_PROFILE_TYPE Camera::GetLiveProfile() const {
+    return Call("GetLiveProfile"), static_cast<CAM_PROFILE_TYPE>(m_LiveProfile);
+}
+int Camera::GetUiStreamNo(CAM_PROFILE_TYPE profile) const {
+    return Call("GetUiStreamNo", profile), 10 * m_Id + profile;
+}
+
+std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds, const std::string& deniedIds,
+                                  bool withDeleted, bool withRemote) {
+    Call("GetCamLocalList", onlyEnabled, groupIds, deniedIds, withDeleted, withRemote);
+    return Script().camera_list;
+}
+int GetLoginPort() {
+    return Call("GetLoginPort"), Script().login_port;
+}
+
+namespace {
+
+struct SoundFunctor : MemFuncInterface<unsigned int, NoneT, NoneT, NoneT, NoneT, NoneT, NoneT, NoneT> {
+    explicit SoundFunctor(unsigned int result) : m_Result(result) {}
+    unsigned int operator()(DPObjectBase&) override { return Call("SoundSupport"), m_Result; }
+    unsigned int m_Result;
+};
+
+}  // namespace
+
+DPObjectBase::~DPObjectBase() = default;
+MemFuncBase::~MemFuncBase() = default;
+DevCapHandler::DevCapHandler() = default;
+DevCapHandler::~DevCapHandler() = default;
+int DevCapHandler::LoadByCam(const Camera& camera) {
+    Call("LoadByCam", camera.m_Id);
+    const Sound sound = Script().sound[camera.m_Id];
+    m_pDevice = std::make_unique<DPObjectBase>();
+    // Twice a yes, so that a number is not passed on in place of one.
+    m_pSoundSupport = std::make_unique<SoundFunctor>(sound == Sound::kYes ? 2 : 0);
+    if (sound == Sound::kWrongType) {
+        m_pSoundSupport = std::make_unique<MemFuncBase>();
+    }
+    m_SoundSupport.m_pTarget = sound == Sound::kNoTarget ? nullptr : m_pDevice.get();
+    m_SoundSupport.m_pFunctor = sound == Sound::kNoFunctor ? nullptr : m_pSoundSupport.get();
+    m_SoundSupport.m_Name = "Sound";
+    return Script().cap_failures.count(camera.m_Id) != 0 ? 1 : 0;
+}
+unsigned int CamCapUtils::GetLiveStmPtzCapByUserName(const DevCapHandler&, const Camera& camera,
+                                                     const std::string& userName) {
+    Call("GetLiveStmPtzCapByUserName", camera.m_Id, userName);
+    return 0x80000000U + static_cast<unsigned int>(camera.m_Id);
+}
+
+LHShmCommonCfg* LHShmCommonCfgAt() {
+    return Script().has_common_cfg ? &Script().common_cfg : nullptr;
+}
+long GetMonoTimeSec() {
+    return static_cast<long>(Script().now);
+}
+
+ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
+    static char segment;
+    Call("LiveStreamFifoAt", camId, streamNo);
+    return Script().has_stream ? reinterpret_cast<ShmStreamFifo*>(&segment) : nullptr;
+}
+void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO*) {
+    Call("StartRead");
+}
+DataEntry* ShmStreamFifo::ReadLatest() {
+    return ReadLatest(-1, nullptr);
+}
+DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
+    Call("ReadLatest", lastSeq);
+    auto& frames = Script().frames;
+    if (frames.empty()) {
+        Script().is_eof = true;
+        return nullptr;
+    }
+    const auto frame = frames.front();
+    frames.pop_front();
+    if (!frame) {
+        return nullptr;
+    }
+    const auto length = frame->length < 0 ? frame->data.size() : static_cast<std::size_t>(frame->length);
+    auto& memory = Script().entries.emplace_back((sizeof(DataEntry) + length) / sizeof(std::uint32_t) + 1);
+    auto* entry = reinterpret_cast<DataEntry*>(memory.data());
+    entry->m_Length = static_cast<int>(length);
+    entry->m_SeqNo = frame->seq;
+    entry->m_Offset = frame->offset;
+    std::memcpy(entry + 1, frame->data.data(), std::min(length, frame->data.size()));
+    return entry;
+}
+void ShmStreamFifo::ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position) {
+    Call("ReadFinish", entry == nullptr ? "null" : "entry", flag, position == nullptr ? "null" : "position");
+}
+void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO*) {
+    Call("StopRead");
+}
+
+LiveStreamUpdater::LiveStreamUpdater(int camId, int streamNo) : m_CamId(camId), m_StreamNo(streamNo) {}
+void LiveStreamUpdater::StartLive() {
+    Call("StartLive", m_CamId, m_StreamNo);
+}
+void LiveStreamUpdater::UpdateStamp() {
+    Call("UpdateStamp");
+}
+
+MultipartResponse::MultipartResponse() : m_blHeadSent(false) {}
+int MultipartResponse::Write(const char* contentType, const void* data, int length, const char* extra) {
+    const std::string text(static_cast<const char*>(data), length < 100 ? static_cast<std::size_t>(length) : 0);
+    Call("Write", contentType, data == nullptr ? "null" : text, length, extra == nullptr ? "null" : extra);
+    m_blHeadSent = true;
+    return 0;
+}

@@ -1,0 +1,239 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The script's life, and the platform's request, admission, privilege and log on it.
+#include "test/support/platform/scripted_platform.h"
+
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+
+#include <unistd.h>
+
+#include "platform/admission/host.h"
+#include "platform/admission/pairauth.h"
+#include "platform/log/lhprintf.h"
+#include "platform/privilege/privprofile.h"
+#include "test/support/platform/record.h"
+
+DbgLogCfg* g_pDbgLogCfg = nullptr;
+int g_DbgLogPid = 0;
+
+struct VEXO::APIRequest::Context {};
+struct VEXO::APIResponse::Context {};
+struct PrivProfile::Data {
+    int id;
+    int privilege;
+    std::set<int> denied;
+    ~Data() {
+        if (lookhaven::test::CurrentPlatform() != nullptr && lookhaven::test::Script().watched_mutex != nullptr) {
+            lookhaven::test::Script().Record("free profile");
+        }
+    }
+};
+
+namespace lookhaven::test {
+namespace {
+
+ScriptedPlatform* current = nullptr;
+
+}  // namespace
+
+ScriptedPlatform* CurrentPlatform() {
+    return current;
+}
+
+ScriptedPlatform::ScriptedPlatform() {
+    pthread_mutexattr_t attributes;
+    pthread_mutexattr_init(&attributes);
+    pthread_mutexattr_setrobust(&attributes, PTHREAD_MUTEX_ROBUST);
+    pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_ERRORCHECK);
+    pthread_mutex_init(&common_cfg.m_Mutex, &attributes);
+    pthread_mutexattr_destroy(&attributes);
+    common_cfg.m_Timestamp = now;
+    common_cfg.m_blPause = 0;
+    g_pDbgLogCfg = &log_cfg;
+    g_DbgLogPid = 0;
+    current = this;
+}
+
+ScriptedPlatform::~ScriptedPlatform() {
+    current = nullptr;
+    g_pDbgLogCfg = nullptr;
+    for (const int signal : {SIGINT, SIGQUIT, SIGTERM, SIGPIPE}) {
+        std::signal(signal, SIG_DFL);
+    }
+    pthread_mutex_destroy(&common_cfg.m_Mutex);
+}
+
+void ScriptedPlatform::Record(const std::string& call) {
+    calls.push_back(call);
+    if (on_call) {
+        on_call(call);
+    }
+}
+
+VEXO::APIRequest* ScriptedPlatform::Request() {
+    static VEXO::APIRequest::Context context;
+    static VEXO::APIRequest request(context);
+    return &request;
+}
+
+VEXO::APIResponse* ScriptedPlatform::Response() {
+    static VEXO::APIResponse::Context context;
+    static VEXO::APIResponse response(context);
+    return &response;
+}
+
+std::vector<std::string> ScriptedPlatform::CallsFrom(const std::string& text) const {
+    auto first = calls.begin();
+    while (first != calls.end() && first->rfind(text, 0) != 0) {
+        ++first;
+    }
+    return {first, calls.end()};
+}
+
+std::string Text(const Json::Value& value) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    return Json::writeString(builder, value);
+}
+
+StdoutCapture::StdoutCapture() : saved_(dup(STDOUT_FILENO)), file_(std::tmpfile()) {
+    std::fflush(stdout);
+    dup2(fileno(file_), STDOUT_FILENO);
+}
+
+StdoutCapture::~StdoutCapture() {
+    std::fflush(stdout);
+    dup2(saved_, STDOUT_FILENO);
+    close(saved_);
+    std::fclose(file_);
+}
+
+std::string StdoutCapture::Text() {
+    std::fflush(stdout);
+    std::string text(4096, '\0');
+    text.resize(static_cast<std::size_t>(pread(fileno(file_), text.data(), text.size(), 0)));
+    return text;
+}
+
+}  // namespace lookhaven::test
+
+using lookhaven::test::Call;
+using lookhaven::test::Script;
+using lookhaven::test::Text;
+
+namespace VEXO {
+
+APIRequest::APIRequest(Context& context) : m_pContext(&context) {}
+Json::Value APIRequest::GetParam(const std::string& name, const Json::Value& defaultValue) const {
+    Call("GetParam", name, Text(defaultValue));
+    const auto found = Script().params.find(name);
+    return found == Script().params.end() ? defaultValue : found->second;
+}
+std::string APIRequest::GetAPIMethod() const {
+    return Call("GetAPIMethod"), Script().method;
+}
+unsigned int APIRequest::GetLoginUID() const {
+    return Call("GetLoginUID"), Script().login_uid;
+}
+std::string APIRequest::GetLoginUserName() const {
+    return Call("GetLoginUserName"), Script().user_name;
+}
+std::string APIRequest::GetSessionID() const {
+    return Call("GetSessionID"), "5e55";
+}
+std::string APIRequest::GetRemoteIP() const {
+    return Call("GetRemoteIP"), "192.0.2.9";
+}
+std::string APIRequest::GetCookie(const std::string& name, const std::string& defaultValue) const {
+    Call("GetCookie", name, defaultValue);
+    const auto found = Script().cookies.find(name);
+    return found == Script().cookies.end() ? defaultValue : found->second;
+}
+bool APIRequest::IsAuthorized() const {
+    return Call("IsAuthorized"), Script().is_authorized;
+}
+bool APIRequest::IsAdmin() const {
+    return Call("IsAdmin"), Script().is_admin;
+}
+bool APIRequest::HasAppPriv(const std::string& application) const {
+    return Call("HasAppPriv", application), Script().has_app_priv;
+}
+
+APIResponse::APIResponse(Context& context) : m_pContext(&context) {}
+void APIResponse::SetSuccess(const Json::Value& data) {
+    Call("SetSuccess", Text(data));
+}
+void APIResponse::SetError(int code, const Json::Value& data) {
+    Call("SetError", code, Text(data));
+}
+void APIResponse::SetEnableOutput(bool enable) {
+    Call("SetEnableOutput", enable);
+}
+
+}  // namespace VEXO
+
+bool IsCmsHost() {
+    return Call("IsCmsHost"), Script().is_cms_host;
+}
+bool IsLHRunning() {
+    return Call("IsLHRunning"), Script().is_running;
+}
+int GetCamOwnerHxId(int camId) {
+    return Call("GetCamOwnerHxId", camId), Script().owner_host;
+}
+void LHTaskSet::SetAffinity(const std::string& taskSet) {
+    Call("SetAffinity", taskSet);
+}
+bool SDKUser::AppPrivUserHas(const std::string& userName, const std::string& application, const std::string& remoteIp) {
+    return Call("AppPrivUserHas", userName, application, remoteIp), Script().has_user_priv;
+}
+bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
+    return Call("IsAuthPairMatch", cookie, timestamp), Script().pair_matches;
+}
+SlaveHxAuthentication::SlaveHxAuthentication() {
+    Call("SlaveHxAuthentication");
+}
+bool SlaveHxAuthentication::IsAuthByPairMatch(const std::string& cookie, const std::string& timestamp) {
+    return Call("IsAuthByPairMatch", cookie, timestamp), Script().pair_matches;
+}
+
+PrivProfile::PrivProfile() = default;
+PrivProfile::PrivProfile(std::shared_ptr<const Data> data) : m_pData(std::move(data)) {}
+int PrivProfile::GetId() const {
+    return m_pData ? m_pData->id : 0;
+}
+int PrivProfile::GetPrivilege() const {
+    return m_pData->privilege;
+}
+std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const {
+    return Call("GetInaCamIdSet", type, withHidden), m_pData->denied;
+}
+void PrivProfile::UpdateByJson(const Json::Value& privData) {
+    Call("UpdateByJson", Text(privData));
+}
+PrivProfile PrivProfileGetByUid(unsigned int uid) {
+    Call("PrivProfileGetByUid", uid);
+    return PrivProfile(std::shared_ptr<const PrivProfile::Data>(
+        new PrivProfile::Data{Script().profile_id, Script().privilege, Script().denied_cameras}));
+}
+
+void LHPrintf(LOG_TYPE, const char* categName, const char* levelName, const char* file, int line, const char* func,
+              const char* fmt, ...) {
+    char text[512];
+    va_list arguments;
+    va_start(arguments, fmt);
+    std::vsnprintf(text, sizeof text, fmt, arguments);
+    va_end(arguments);
+    const auto name = [](const char* value) { return value == nullptr ? "null" : value; };
+    Script().logs.push_back({name(categName), name(levelName), file, line, func, text});
+    Script().Record(std::string("log ") + text);
+}
+template <>
+LHEnum2StrMap<LOG_CATEG>::LHEnum2StrMap() : m_Names{{LOG_CATEG_LIVEVIEW, "liveview"}} {}
+// Leaves LOG_LEVEL_WARN out: a value without a name.
+template <>
+LHEnum2StrMap<LOG_LEVEL>::LHEnum2StrMap()
+    : m_Names{
+          {LOG_LEVEL_ERR, "err"}, {LOG_LEVEL_NOTICE, "notice"}, {LOG_LEVEL_INFO, "info"}, {LOG_LEVEL_DEBUG, "debug"}} {}

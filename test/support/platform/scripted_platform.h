@@ -1,0 +1,116 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A platform that answers from a script and writes down, in order, what the module asked of it and of the system.
+#pragma once
+
+#include <csignal>
+#include <ctime>
+#include <deque>
+#include <functional>
+#include <list>
+#include <map>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <json/json.h>
+#include <pthread.h>
+
+#include "platform/camera/camera.h"
+#include "platform/live/commoncfg.h"
+#include "platform/log/dbglogcfg.h"
+#include "platform/webapi/apirequest.h"
+#include "platform/webapi/apiresponse.h"
+
+namespace lookhaven::test {
+
+struct LogLine {
+    std::string categ, level, file;  // "null" for a null pointer
+    int line;
+    std::string func, text;
+};
+
+// What one ReadLatest gives.
+struct ScriptedFrame {
+    int seq = 1;
+    std::string data = "JPEG";  // the offset's bytes included
+    int offset = 0;
+    int length = -1;  // -1: of data
+};
+
+enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
+
+// While one exists it is the platform of the process, and sleep, usleep, time, sigaction, shmdt and the state of standard
+// output are its script's. Every call is first recorded, then shown to on_call, which may change the script or throw.
+class ScriptedPlatform {
+  public:
+    ScriptedPlatform();
+    ~ScriptedPlatform();
+    ScriptedPlatform(const ScriptedPlatform&) = delete;
+    ScriptedPlatform& operator=(const ScriptedPlatform&) = delete;
+
+    void Record(const std::string& call);
+    VEXO::APIRequest* Request();
+    VEXO::APIResponse* Response();
+    // The recorded calls from the first that begins with the text on.
+    std::vector<std::string> CallsFrom(const std::string& text) const;
+
+    std::vector<std::string> calls;
+    std::vector<LogLine> logs;
+    std::function<void(const std::string& call)> on_call;
+
+    std::string method;
+    std::map<std::string, Json::Value> params;
+    std::map<std::string, std::string> cookies;
+    bool is_authorized = false, has_app_priv = false, is_admin = false, has_user_priv = false;
+    std::string user_name = "eve";
+    unsigned int login_uid = 7;
+
+    bool is_cms_host = false, is_running = true, pair_matches = false;
+    int owner_host = 0;
+
+    int profile_id = 1, privilege = 2;
+    std::set<int> denied_cameras;
+
+    std::map<int, Camera> cameras;  // for Load
+    std::list<Camera> camera_list;  // for GetCamLocalList
+    int login_port = 5000;
+    std::set<int> cap_failures;
+    std::map<int, Sound> sound;
+
+    bool has_stream = true;
+    std::deque<std::optional<ScriptedFrame>> frames;  // when used up, standard output ends
+    LHShmCommonCfg common_cfg;
+    bool has_common_cfg = true;
+    DbgLogCfg log_cfg = {};
+
+    std::time_t now = 1000000;  // wall clock and monotonic clock; sleeping moves it
+    std::set<int> failing_signals;
+    bool flush_fails = false;
+    bool is_eof = false, is_error = false;
+    const void* watched_mutex = nullptr;  // record what is done with it, and the end of a profile
+    std::list<std::vector<std::uint32_t>> entries;
+};
+
+// The one that exists, or null.
+ScriptedPlatform* CurrentPlatform();
+
+// A camera of one stream per profile: 10 · id + profile.
+Camera MakeCamera(int id, int video_type, bool enabled = true);
+
+// Standard output while it exists goes to a file.
+class StdoutCapture {
+  public:
+    StdoutCapture();
+    ~StdoutCapture();
+    StdoutCapture(const StdoutCapture&) = delete;
+    StdoutCapture& operator=(const StdoutCapture&) = delete;
+    std::string Text();
+
+  private:
+    int saved_;
+    std::FILE* file_;
+};
+
+}  // namespace lookhaven::test

@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The system calls that a script governs; the linker sends the module's calls here (--wrap). Without a script they pass.
+#include <cerrno>
+#include <cstdio>
+
+#include <unistd.h>
+
+#include "test/support/platform/record.h"
+
+using lookhaven::test::Call;
+using lookhaven::test::CurrentPlatform;
+using lookhaven::test::Script;
+
+namespace {
+
+void RecordMutex(const char* what, const pthread_mutex_t* mutex) {
+    if (CurrentPlatform() != nullptr && mutex == Script().watched_mutex) {
+        Script().Record(what);
+    }
+}
+
+}  // namespace
+
+extern "C" {
+
+int __real_sigaction(int, const struct sigaction*, struct sigaction*);
+unsigned int __real_sleep(unsigned int);
+int __real_usleep(useconds_t);
+std::time_t __real_time(std::time_t*);
+int __real_fflush(std::FILE*);
+int __real_feof(std::FILE*);
+int __real_ferror(std::FILE*);
+int __real_shmdt(const void*);
+int __real_pthread_mutex_lock(pthread_mutex_t*);
+int __real_pthread_mutex_unlock(pthread_mutex_t*);
+int __real_pthread_mutex_destroy(pthread_mutex_t*);
+
+int __wrap_sigaction(int signal, const struct sigaction* action, struct sigaction* old) {
+    if (CurrentPlatform() == nullptr) {
+        return __real_sigaction(signal, action, old);
+    }
+    Call("sigaction", signal, action->sa_flags, sigisemptyset(&action->sa_mask) ? "no mask" : "mask");
+    return Script().failing_signals.count(signal) != 0 ? -1 : __real_sigaction(signal, action, old);
+}
+unsigned int __wrap_sleep(unsigned int seconds) {
+    if (CurrentPlatform() == nullptr) {
+        return __real_sleep(seconds);
+    }
+    Script().now += static_cast<std::time_t>(seconds);
+    return Call("sleep", seconds), 0;
+}
+int __wrap_usleep(useconds_t microseconds) {
+    if (CurrentPlatform() == nullptr) {
+        return __real_usleep(microseconds);
+    }
+    return Call("usleep", microseconds), 0;
+}
+std::time_t __wrap_time(std::time_t* result) {
+    return CurrentPlatform() == nullptr ? __real_time(result) : Script().now;
+}
+int __wrap_fflush(std::FILE* stream) {
+    if (CurrentPlatform() == nullptr || stream != stdout) {
+        return __real_fflush(stream);
+    }
+    Call("fflush");
+    if (Script().flush_fails) {
+        errno = EPIPE;
+        return EOF;
+    }
+    return __real_fflush(stream);
+}
+int __wrap_feof(std::FILE* stream) {
+    return CurrentPlatform() == nullptr || stream != stdout ? __real_feof(stream) : Script().is_eof;
+}
+int __wrap_ferror(std::FILE* stream) {
+    return CurrentPlatform() == nullptr || stream != stdout ? __real_ferror(stream) : Script().is_error;
+}
+int __wrap_shmdt(const void* segment) {
+    if (CurrentPlatform() == nullptr) {
+        return __real_shmdt(segment);
+    }
+    return Call("shmdt"), 0;
+}
+int __wrap_pthread_mutex_lock(pthread_mutex_t* mutex) {
+    RecordMutex("lock", mutex);
+    return __real_pthread_mutex_lock(mutex);
+}
+int __wrap_pthread_mutex_unlock(pthread_mutex_t* mutex) {
+    RecordMutex("unlock", mutex);
+    return __real_pthread_mutex_unlock(mutex);
+}
+int __wrap_pthread_mutex_destroy(pthread_mutex_t* mutex) {
+    RecordMutex("destroy", mutex);
+    return __real_pthread_mutex_destroy(mutex);
+}
+
+}  // extern "C"
