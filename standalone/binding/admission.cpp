@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Who may come in, and what this host is: a recorder of its own, without a managing host or recording servers.
+#include "platform/admission/host.h"
+#include "platform/admission/pairauth.h"
+#include "platform/live/commoncfg.h"
+#include "standalone/base/clock.h"
+#include "standalone/binding/request.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/ring/common_config.h"
+#include "standalone/store/users.h"
+
+namespace ring = lookhaven::ring;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+static_assert(sizeof(LHShmCommonCfg) == sizeof(ring::CommonConfig));
+static_assert(offsetof(LHShmCommonCfg, m_Timestamp) == offsetof(ring::CommonConfig, timestamp_sec));
+static_assert(offsetof(LHShmCommonCfg, m_blPause) == offsetof(ring::CommonConfig, paused));
+
+namespace {
+
+// Mapped once; asked again only while there is none, since the record may come later.
+ring::CommonConfig* CommonRecord() {
+    static ring::CommonConfig* record = nullptr;
+    if (record == nullptr) {
+        record = OrFailure<ring::CommonConfig*>("common configuration", nullptr,
+                                                [] { return ring::MapCommonConfig(RequestContext::Current().Home()); });
+    }
+    return record;
+}
+
+}  // namespace
+
+LHShmCommonCfg* LHShmCommonCfgAt() {
+    return reinterpret_cast<LHShmCommonCfg*>(CommonRecord());
+}
+
+long GetMonoTimeSec() {
+    return static_cast<long>(lookhaven::base::MonotonicMicros() / 1'000'000);
+}
+
+bool IsLHRunning() {
+    ring::CommonConfig* record = CommonRecord();
+    return record != nullptr && ring::IsRecorderAlive(*record);
+}
+
+bool IsCmsHost() {
+    return false;
+}
+
+int GetCamOwnerHxId(int) {
+    return 0;
+}
+
+// The default task set is every processor, where a process runs anyway; there are no others.
+void LHTaskSet::SetAffinity(const std::string&) {}
+
+bool SDKUser::AppPrivUserHas(const std::string& userName, const std::string& application, const std::string&) {
+    return application == lookhaven::binding::kApplication && OrFailure("AppPrivUserHas", false, [&] {
+               return lookhaven::store::Users(RequestContext::Current().Records()).FindByName(userName).has_value();
+           });
+}
+
+// Matching needs a secret that two hosts share. This host has no way to be paired yet, so nothing can match.
+bool IsAuthPairMatch(const std::string&, const std::string&) {
+    return false;
+}
+
+SlaveHxAuthentication::SlaveHxAuthentication() = default;
+
+bool SlaveHxAuthentication::IsAuthByPairMatch(const std::string&, const std::string&) {
+    return false;
+}

@@ -1,0 +1,162 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Live streams: who may attach a ring, how long attaching waits, and the ring's calls under the platform's names.
+#include <array>
+#include <csignal>
+#include <cstddef>
+#include <optional>
+
+#include <time.h>
+
+#include "platform/admission/host.h"
+#include "platform/live/livestream.h"
+#include "platform/privilege/privprofile.h"
+#include "standalone/base/clock.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/ring/demand.h"
+#include "standalone/ring/reader.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/users.h"
+
+namespace ring = lookhaven::ring;
+namespace store = lookhaven::store;
+using lookhaven::base::MonotonicMicros;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+static_assert(sizeof(DataEntry) == sizeof(ring::Entry));
+static_assert(offsetof(DataEntry, m_Length) == offsetof(ring::Entry, length));
+static_assert(offsetof(DataEntry, m_SeqNo) == offsetof(ring::Entry, sequence));
+static_assert(offsetof(DataEntry, m_Offset) == offsetof(ring::Entry, offset));
+static_assert(offsetof(DataEntry, m_Flags) == offsetof(ring::Entry, flags));
+static_assert(offsetof(DataEntry, m_TimestampLow) == offsetof(ring::Entry, timestamp_low));
+static_assert(DATA_ENTRY_KEY_FRAME == ring::kKeyFrame && DATA_ENTRY_SEQ_NONE == ring::kNoSequence);
+static_assert(sizeof(__tag_DATA_ENTRY_INFO) == sizeof(ring::Position));
+static_assert(alignof(__tag_DATA_ENTRY_INFO) == alignof(ring::Position));
+static_assert(offsetof(__tag_DATA_ENTRY_INFO, m_Reader) == offsetof(ring::Position, reader));
+static_assert(offsetof(__tag_DATA_ENTRY_INFO, m_Pinned) == offsetof(ring::Position, pinned));
+static_assert(offsetof(__tag_DATA_ENTRY_INFO, m_Generation) == offsetof(ring::Position, generation));
+
+namespace {
+
+constexpr std::int64_t kMaxAttachMicros = 5'000'000;
+constexpr long kAttachPollNanos = 10'000'000;
+
+ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
+    return reinterpret_cast<ring::Position*>(position);
+}
+
+DataEntry* Held(const ring::Entry* entry) {
+    RequestContext::Current().SetHeldEntry(entry);
+    return reinterpret_cast<DataEntry*>(const_cast<ring::Entry*>(entry));
+}
+
+// The recorder has left the ring for a new one: its reader should come again rather than wait for a time-out.
+void EndReaderOfRetired(const void* stream) {
+    if (ring::IsRetired(stream)) {
+        std::raise(SIGTERM);
+    }
+}
+
+bool MayWatch(store::Store& records, unsigned int caller, int camera) {
+    if (caller == PAIR_AUTH_UID) {
+        return true;
+    }
+    store::Users users(records);
+    const int id = static_cast<int>(caller);
+    return caller != 0 && users.Find(id) && !users.DeniedCameras(id, store::CameraAccess::kLive).contains(camera);
+}
+
+bool HasStream(store::Store& records, int camera_id, int stream) {
+    const std::optional<store::Camera> camera = store::Cameras(records).Find(camera_id);
+    return camera && camera->enabled && camera->FindProfile(stream) != nullptr;
+}
+
+// Waits for a ring with a frame of this start; null when none comes in time, the recorder dies or a signal arrives.
+void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
+    ring::Demand demand(context.Home());
+    void* stream = nullptr;
+    for (const std::int64_t start = MonotonicMicros();;) {
+        if (stream == nullptr) {
+            stream = ring::Attach(context.Home(), id);
+        }
+        if (stream != nullptr && !ring::IsRetired(stream) && ring::HasFrameOfThisStart(stream)) {
+            return stream;
+        }
+        if (stream != nullptr && ring::IsRetired(stream)) {
+            ring::Detach(stream);
+            stream = nullptr;
+        }
+        demand.Touch(*context.GrantedStream());
+        const timespec pause{0, kAttachPollNanos};
+        if (MonotonicMicros() - start > kMaxAttachMicros || !IsLHRunning() || ::nanosleep(&pause, nullptr) != 0) {
+            break;
+        }
+    }
+    if (stream != nullptr) {
+        ring::Detach(stream);
+    }
+    return nullptr;
+}
+
+}  // namespace
+
+ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
+    RequestContext& context = RequestContext::Current();
+    context.NoteStream();
+    void* stream = OrFailure<void*>("LiveStreamFifoAt", nullptr, [&]() -> void* {
+        if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo) ||
+            !MayWatch(context.Records(), context.Caller(), camId)) {
+            return nullptr;
+        }
+        context.CloseRecords();
+        context.GrantStream({camId, streamNo});
+        return AttachRunning(context, {camId, streamNo, ring::Medium::kVideo});
+    });
+    return static_cast<ShmStreamFifo*>(stream);
+}
+
+void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO* position) {
+    if (position != nullptr) {
+        ring::StartRead(this, Inner(position));
+    }
+}
+
+DataEntry* ShmStreamFifo::ReadLatest() {
+    return Held(ring::ReadLatest(this));
+}
+
+DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
+    EndReaderOfRetired(this);
+    return Held(ring::ReadLatest(this, lastSeq, Inner(position)));
+}
+
+void ShmStreamFifo::ReadFinish(DataEntry* entry, bool, __tag_DATA_ENTRY_INFO* position) {
+    RequestContext::Current().SetHeldEntry(nullptr);
+    ring::ReadFinish(this, reinterpret_cast<const ring::Entry*>(entry), Inner(position));
+}
+
+void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
+    RequestContext::Current().SetHeldEntry(nullptr);
+    ring::StopRead(this, Inner(position));
+}
+
+LiveStreamUpdater::LiveStreamUpdater(int camId, int streamNo) : m_CamId(camId), m_StreamNo(streamNo) {}
+
+void LiveStreamUpdater::StartLive() {
+    UpdateStamp();
+}
+
+// Only for the stream that the caller was given: a wish alone must not start a camera that the caller may not see.
+// Attaching wishes for itself.
+void LiveStreamUpdater::UpdateStamp() {
+    OrFailure("LiveStreamUpdater", 0, [&] {
+        const RequestContext& context = RequestContext::Current();
+        const ring::LiveStream stream{m_CamId, m_StreamNo};
+        if (context.GrantedStream() == stream) {
+            static ring::Demand demand(context.Home());
+            demand.Touch(stream);
+        }
+        return 0;
+    });
+}

@@ -1,0 +1,80 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Privilege profiles: what a user may not see, read from the store and narrowed by what a relaying host sends along.
+//
+// Format        {"privilege": 2, "deniedCameras": [3, 7]}; both may be missing. A denied camera is denied for every kind
+//               of access.
+#include <algorithm>
+#include <map>
+
+#include "platform/privilege/privprofile.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/store/users.h"
+
+namespace store = lookhaven::store;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+static_assert(static_cast<int>(store::CameraAccess::kLive) == CAM_PRIV_LIVEVIEW);
+static_assert(static_cast<int>(store::CameraAccess::kPlayback) == CAM_PRIV_PLAYBACK);
+static_assert(static_cast<int>(store::CameraAccess::kAudio) == CAM_PRIV_AUDIO);
+static_assert(store::kPeerUserId == PAIR_AUTH_UID);
+
+struct PrivProfile::Data {
+    int id = 0;
+    int privilege = static_cast<int>(store::Privilege::kViewer);
+    std::map<int, std::set<int>> denied_cameras;  // by CAM_PRIV_TYPE
+};
+
+PrivProfile::PrivProfile() : m_pData(std::make_shared<const Data>()) {}
+
+PrivProfile::PrivProfile(std::shared_ptr<const Data> data) : m_pData(std::move(data)) {}
+
+int PrivProfile::GetId() const {
+    return m_pData->id;
+}
+
+int PrivProfile::GetPrivilege() const {
+    return m_pData->privilege;
+}
+
+// No list hides a camera here, so withHidden adds none.
+std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool) const {
+    const auto denied = m_pData->denied_cameras.find(type);
+    return denied == m_pData->denied_cameras.end() ? std::set<int>{} : denied->second;
+}
+
+void PrivProfile::UpdateByJson(const Json::Value& privData) {
+    if (privData.isNull()) {
+        return;
+    }
+    auto narrowed = std::make_shared<Data>(*m_pData);
+    narrowed->privilege = std::max(narrowed->privilege, privData.get("privilege", 0).asInt());
+    for (const Json::Value& camera : privData.get("deniedCameras", Json::arrayValue)) {
+        for (const store::CameraAccess kind : store::kEveryAccess) {
+            narrowed->denied_cameras[static_cast<int>(kind)].insert(camera.asInt());
+        }
+    }
+    m_pData = std::move(narrowed);
+}
+
+PrivProfile PrivProfileGetByUid(unsigned int uid) {
+    return OrFailure("PrivProfileGetByUid", PrivProfile(), [&] {
+        auto data = std::make_shared<PrivProfile::Data>();
+        if (uid == PAIR_AUTH_UID) {
+            data->id = static_cast<int>(PAIR_AUTH_UID);
+            return PrivProfile(data);
+        }
+        store::Users users(RequestContext::Current().Records());
+        const auto user = users.Find(static_cast<int>(uid));
+        if (!user) {
+            return PrivProfile();
+        }
+        data->id = user->id;
+        data->privilege = static_cast<int>(user->privilege);
+        for (const store::CameraAccess kind : store::kEveryAccess) {
+            data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
+        }
+        return PrivProfile(data);
+    });
+}

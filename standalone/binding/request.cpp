@@ -1,0 +1,134 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/binding/request.h"
+
+#include <algorithm>
+#include <array>
+#include <memory>
+#include <sstream>
+
+namespace {
+
+bool IsOneOf(std::string_view name, std::initializer_list<std::string_view> names) {
+    return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+std::optional<Json::Value> StrictJson(const std::string& text) {
+    Json::CharReaderBuilder builder;
+    Json::CharReaderBuilder::strictMode(&builder.settings_);
+    builder["strictRoot"] = false;
+    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    Json::Value value;
+    try {
+        if (reader->parse(text.data(), text.data() + text.size(), &value, nullptr)) {
+            return value;
+        }
+    } catch (const Json::Exception&) {
+        // Nested too deep to be meant as JSON.
+    }
+    return std::nullopt;
+}
+
+std::string CompactText(const Json::Value& value) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    builder["emitUTF8"] = true;
+    builder["precision"] = 15;  // the most digits that every decimal fraction keeps
+    return Json::writeString(builder, value);
+}
+
+}  // namespace
+
+namespace lookhaven::binding {
+
+Json::Value JsonFromText(std::string_view name, const std::string& text) {
+    constexpr std::string_view kFirstBytes = "-0123456789tfn\"[{";
+    if (!text.empty() && kFirstBytes.find(text.front()) != kFirstBytes.npos &&
+        !IsOneOf(name, {"account", "password", "cookie"})) {
+        std::optional<Json::Value> value = StrictJson(text);
+        if (value && (value->isObject() || value->isArray() || CompactText(*value) == text)) {
+            return *std::move(value);
+        }
+    }
+    return text;
+}
+
+}  // namespace lookhaven::binding
+
+namespace VEXO {
+
+APIRequest::APIRequest(Context& context) : m_pContext(&context) {}
+
+Json::Value APIRequest::GetParam(const std::string& name, const Json::Value& defaultValue) const {
+    if (name.empty()) {
+        Json::Value all(Json::objectValue);
+        for (const auto& [key, value] : m_pContext->parameters) {
+            if (!IsOneOf(key, {"password", "cookie"})) {
+                all[key] = value;
+            }
+        }
+        return all;
+    }
+    const auto found = m_pContext->parameters.find(name);
+    if (found == m_pContext->parameters.end() || (defaultValue.isBool() && !found->second.isBool())) {
+        return defaultValue.isString() ? lookhaven::binding::JsonFromText(name, defaultValue.asString()) : defaultValue;
+    }
+    return found->second;
+}
+
+std::string APIRequest::GetAPIMethod() const {
+    return m_pContext->method;
+}
+
+unsigned int APIRequest::GetLoginUID() const {
+    return m_pContext->login ? m_pContext->login->user_id : 0;
+}
+
+std::string APIRequest::GetLoginUserName() const {
+    return m_pContext->login ? m_pContext->login->account : "";
+}
+
+std::string APIRequest::GetSessionID() const {
+    return m_pContext->login ? m_pContext->login->session_handle : "";
+}
+
+std::string APIRequest::GetRemoteIP() const {
+    return m_pContext->remote_ip;
+}
+
+std::string APIRequest::GetCookie(const std::string& name, const std::string& defaultValue) const {
+    const auto found = m_pContext->cookies.find(name);
+    return found == m_pContext->cookies.end() ? defaultValue : found->second;
+}
+
+bool APIRequest::IsAuthorized() const {
+    return m_pContext->login.has_value();
+}
+
+bool APIRequest::IsAdmin() const {
+    return m_pContext->login && m_pContext->login->is_manager;
+}
+
+bool APIRequest::HasAppPriv(const std::string& application) const {
+    return m_pContext->login && application == lookhaven::binding::kApplication;
+}
+
+APIResponse::APIResponse(Context& context) : m_pContext(&context) {}
+
+void APIResponse::SetSuccess(const Json::Value& data) {
+    Json::Value& answer = m_pContext->answer.emplace(Json::objectValue);
+    answer["success"] = true;
+    answer["data"] = data;
+}
+
+void APIResponse::SetError(int code, const Json::Value& data) {
+    Json::Value& answer = m_pContext->answer.emplace(Json::objectValue);
+    answer["success"] = false;
+    answer["error"]["code"] = code;
+    answer["error"]["data"] = data;
+}
+
+void APIResponse::SetEnableOutput(bool enable) {
+    m_pContext->output_enabled = enable;
+}
+
+}  // namespace VEXO

@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What stands behind the request and the response that the module is given; the host fills the one and reads the other.
+#pragma once
+
+#include <map>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include <json/json.h>
+
+#include "platform/export.h"
+#include "platform/webapi/apirequest.h"
+#include "platform/webapi/apiresponse.h"
+
+namespace lookhaven::binding {
+
+// The application that an account here may use, every account.
+constexpr const char* kApplication = "VEXO.VDX.Lookhaven";
+
+struct Login {
+    unsigned int user_id = 0;
+    std::string account;
+    std::string session_handle;
+    bool is_manager = false;
+};
+
+// The JSON value of a parameter's text. A text becomes a number, a truth value or null only when writing that value
+// gives the same text again ("5", but not "5,7", "007" or "1e5"), so that nothing that merely looks like a number is
+// damaged; an object or array counts by strict JSON. Anything else is a string, and so is every text of a parameter
+// named account, password or cookie.
+LH_PLATFORM_API Json::Value JsonFromText(std::string_view name, const std::string& text);
+
+}  // namespace lookhaven::binding
+
+struct VEXO::APIRequest::Context {
+    std::map<std::string, Json::Value> parameters;
+    std::map<std::string, std::string> cookies;
+    std::string method;
+    std::string remote_ip;
+    std::optional<lookhaven::binding::Login> login;
+};
+
+struct VEXO::APIResponse::Context {
+    std::optional<Json::Value> answer;
+    bool output_enabled = true;
+};

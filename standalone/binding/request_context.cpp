@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/binding/request_context.h"
+
+#include <stdexcept>
+#include <string>
+
+#include "platform/log/dbglogcfg.h"
+#include "standalone/base/debug_log_config.h"
+#include "standalone/base/log.h"
+
+DbgLogCfg* g_pDbgLogCfg = nullptr;
+int g_DbgLogPid = 0;
+
+namespace lookhaven::binding {
+
+static_assert(sizeof(DbgLogCfg) == sizeof(base::DebugLogConfig));
+static_assert(offsetof(DbgLogCfg, m_CategLevel) == offsetof(base::DebugLogConfig, category_level));
+static_assert(offsetof(DbgLogCfg, m_PidCount) == offsetof(base::DebugLogConfig, process_count));
+static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(base::DebugLogConfig, process));
+
+RequestContext& RequestContext::Current() {
+    // Never destroyed: a request process leaves by _exit, and what is here goes with it.
+    static RequestContext& context = *new RequestContext;
+    return context;
+}
+
+void RequestContext::Begin(const base::Installation& installation, Output* output, std::function<void()> on_stream) {
+    base::SetLogProgram("request");
+    installation_ = installation;
+    output_ = output;
+    on_stream_ = std::move(on_stream);
+    g_DbgLogPid = 0;
+    // The module only reads it, through a declaration that knows no const.
+    const void* config = base::MapDebugLog(installation);
+    g_pDbgLogCfg = static_cast<DbgLogCfg*>(const_cast<void*>(config));
+}
+
+const base::Installation& RequestContext::Home() const {
+    if (!installation_) {
+        throw std::logic_error("this process serves no request");
+    }
+    return *installation_;
+}
+
+store::Store& RequestContext::Records() {
+    if (records_ == nullptr) {
+        records_ = std::make_unique<store::Store>(store::Store::Open(Home().StoreUrl()));
+    }
+    return *records_;
+}
+
+void RequestContext::CloseRecords() {
+    records_.reset();
+}
+
+void RequestContext::NoteStream() {
+    if (!is_stream_) {
+        is_stream_ = true;
+        if (on_stream_) {
+            on_stream_();
+        }
+    }
+}
+
+void LogFailure(const char* name, const std::exception& error) {
+    base::LogError(std::string(name) + ": " + error.what());
+}
+
+}  // namespace lookhaven::binding

@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the platform knows of the one request that this process serves.
+//
+// Why so        The module asks for a ring or a camera without saying on whose behalf, so who the caller is must be known
+//               to the whole process. A request process serves one request, hence one context.
+// Thread safety One thread.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+
+#include "platform/export.h"
+#include "standalone/base/installation.h"
+#include "standalone/binding/output.h"
+#include "standalone/ring/demand.h"
+#include "standalone/ring/stream.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::binding {
+
+class LH_PLATFORM_API RequestContext {
+  public:
+    // The context of this process. Belongs to no installation until Begin.
+    static RequestContext& Current();
+
+    RequestContext() = default;
+    RequestContext(const RequestContext&) = delete;
+    RequestContext& operator=(const RequestContext&) = delete;
+
+    // Borrows output for the rest of the process's life, null where nothing is sent. on_stream is called once, when it
+    // turns out that the request asks for a live picture or a stream: such a request may take its time.
+    void Begin(const base::Installation& installation, Output* output, std::function<void()> on_stream);
+
+    // Throws std::logic_error before Begin.
+    const base::Installation& Home() const;
+    Output* output() const { return output_; }
+
+    // The record store, opened by the first call. Throws store::StoreError.
+    store::Store& Records();
+    // A stream may run for weeks and would hold on to the store; whoever starts to send or to wait closes it.
+    void CloseRecords();
+
+    // The caller: a user's id, PAIR_AUTH_UID for a peer, 0 for nobody.
+    unsigned int Caller() const { return caller_; }
+    void SetCaller(unsigned int user_id) { caller_ = user_id; }
+
+    // The live stream that the caller was found to be allowed.
+    const std::optional<ring::LiveStream>& GrantedStream() const { return granted_; }
+    void GrantStream(ring::LiveStream stream) { granted_ = stream; }
+
+    // A live picture or a stream is asked for.
+    void NoteStream();
+    bool IsStream() const { return is_stream_; }
+
+    // The ring entry that was read last and not given back; null when there is none.
+    const ring::Entry* HeldEntry() const { return held_entry_; }
+    void SetHeldEntry(const ring::Entry* entry) { held_entry_ = entry; }
+
+  private:
+    std::optional<base::Installation> installation_;
+    Output* output_ = nullptr;
+    std::function<void()> on_stream_;
+    std::unique_ptr<store::Store> records_;
+    unsigned int caller_ = 0;
+    std::optional<ring::LiveStream> granted_;
+    bool is_stream_ = false;
+    const ring::Entry* held_entry_ = nullptr;
+};
+
+// Writes "name: what" to the log.
+void LogFailure(const char* name, const std::exception& error);
+
+// Runs ask; what it throws is logged under the name and answered by failure. For calls that the module can only see
+// fail or succeed.
+template <typename Result, typename Ask>
+Result OrFailure(const char* name, Result failure, Ask&& ask) {
+    try {
+        return ask();
+    } catch (const std::exception& error) {
+        LogFailure(name, error);
+        return failure;
+    }
+}
+
+}  // namespace lookhaven::binding

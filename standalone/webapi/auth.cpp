@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/webapi/auth.h"
+
+#include "standalone/base/clock.h"
+#include "standalone/store/login_throttle.h"
+#include "standalone/store/sessions.h"
+#include "standalone/store/users.h"
+#include "standalone/webapi/answer.h"
+
+namespace lookhaven::webapi {
+
+namespace {
+
+constexpr const char* kSessionCookie = "id";
+
+std::int64_t NowSeconds() {
+    return base::WallMillis() / 1000;
+}
+
+std::string CookieLine(const ScgiRequest& request, const std::string& value) {
+    return std::string("Set-Cookie: ") + kSessionCookie + '=' + value + "; Path=/; HttpOnly; SameSite=Strict" +
+           (request.Header("HTTPS") == "on" ? "; Secure\r\n" : "\r\n");
+}
+
+std::string Success(const Json::Value& data, const std::string& extra = "") {
+    Json::Value body;
+    body["success"] = true;
+    body["data"] = data;
+    return JsonAnswer(200, body, extra);
+}
+
+Json::Value Identity(const std::string& account, int user_id, bool is_manager) {
+    Json::Value data;
+    data["account"] = account;
+    data["user_id"] = user_id;
+    data["is_manager"] = is_manager;
+    return data;
+}
+
+void RequirePost(const ScgiRequest& request) {
+    if (request.Header("REQUEST_METHOD") != "POST") {
+        throw Failure(405, "this method takes POST only");
+    }
+}
+
+std::string LogIn(store::Store& records, const ScgiRequest& request, const Parameters& parameters) {
+    RequirePost(request);
+    const std::string account = Find(parameters, "account").asString();
+    const std::string_view address = request.Header("REMOTE_ADDR");
+    store::LoginThrottle throttle(records);
+    if (const int wait_s = throttle.Enter(account, address, NowSeconds()); wait_s > 0) {
+        throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds");
+    }
+    const auto user = store::Users(records).CheckPassword(account, Find(parameters, "password").asString());
+    if (!user) {
+        throw Failure(401, "wrong account or password");
+    }
+    throttle.Clear(account, address);
+    const store::NewSession session = store::Sessions(records).Create(user->id, NowSeconds());
+    return Success(Identity(user->name, user->id, user->IsManager()), CookieLine(request, session.secret));
+}
+
+}  // namespace
+
+std::optional<binding::Login> FindLogin(binding::RequestContext& context,
+                                        const std::map<std::string, std::string>& cookies) {
+    const auto cookie = cookies.find(kSessionCookie);
+    if (cookie == cookies.end() || cookie->second.empty()) {
+        return std::nullopt;
+    }
+    store::Sessions sessions(context.Records());
+    const auto session = sessions.FindBySecret(cookie->second, NowSeconds());
+    if (!session) {
+        return std::nullopt;
+    }
+    sessions.Touch(*session, NowSeconds());
+    return binding::Login{static_cast<unsigned int>(session->user.id), session->user.name, session->handle,
+                          session->user.IsManager()};
+}
+
+std::string ServeAuth(binding::RequestContext& context, SlotTable& slots, const ScgiRequest& request, int version,
+                      const std::string& method, const Parameters& parameters) {
+    if (version != 1 || (method != "Login" && method != "Logout" && method != "Status")) {
+        throw Failure(404, "no such api, version or method");
+    }
+    if (method == "Login") {
+        return LogIn(context.Records(), request, parameters);
+    }
+    if (method == "Logout") {
+        RequirePost(request);
+    }
+    const auto login = FindLogin(context, ReadCookies(request));
+    if (!login) {
+        throw Failure(401, "no session");
+    }
+    if (method == "Status") {
+        return Success(Identity(login->account, static_cast<int>(login->user_id), login->is_manager));
+    }
+    store::Sessions(context.Records()).End(login->session_handle);
+    slots.EndSession(login->session_handle);
+    return Success(Json::nullValue, CookieLine(request, "; Max-Age=0"));
+}
+
+}  // namespace lookhaven::webapi

@@ -1,0 +1,94 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// lookhaven-webapi: hosts web API modules behind a web server that speaks SCGI.
+#include <cstdlib>
+#include <filesystem>
+#include <iostream>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <sys/resource.h>
+#include <sysexits.h>
+
+#include "standalone/base/installation.h"
+#include "standalone/base/log.h"
+#include "standalone/webapi/listener.h"
+#include "standalone/webapi/modules.h"
+#include "standalone/webapi/server.h"
+
+namespace base = lookhaven::base;
+namespace webapi = lookhaven::webapi;
+
+namespace {
+
+struct Options {
+    std::string home;
+    std::string socket;
+    std::vector<std::string> modules;
+    webapi::ServerLimits limits;
+};
+
+void AddMillis(CLI::App& app, const char* name, std::chrono::milliseconds& value, const char* text) {
+    app.add_option_function<double>(
+           name,
+           [&value](const double& seconds) {
+               value = std::chrono::milliseconds(static_cast<std::int64_t>(seconds * 1000));
+           },
+           text)
+        ->check(CLI::Range(0.01, 3600.0));
+}
+
+void Describe(CLI::App& app, Options& options) {
+    app.add_option("--home", options.home, "state folder (LOOKHAVEN_HOME, else var)");
+    app.add_option("--socket", options.socket, "unix socket to listen on (run/webapi.sock in the state folder)");
+    app.add_option("--module", options.modules, "web API module to serve; may be given several times");
+    app.add_option("--max-requests", options.limits.requests, "requests running at once")->check(CLI::Range(1, 4096));
+    app.add_option("--max-requests-per-session", options.limits.requests_per_session, "of them, of one session")
+        ->check(CLI::Range(1, 4096));
+    AddMillis(app, "--read-seconds", options.limits.read, "for a request to arrive");
+    AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is no stream");
+    AddMillis(app, "--leave-seconds", options.limits.processes.leave, "for a process that was told to end");
+}
+
+// Each running request costs the host two descriptors.
+void RaiseDescriptorLimit() {
+    rlimit limit{};
+    if (::getrlimit(RLIMIT_NOFILE, &limit) == 0) {
+        limit.rlim_cur = limit.rlim_max;
+        ::setrlimit(RLIMIT_NOFILE, &limit);
+    }
+}
+
+void Run(const Options& options) {
+    const base::Installation installation =
+        options.home.empty() ? base::Installation::FromEnvironment() : base::Installation(options.home);
+    webapi::Modules modules;
+    for (const std::string& module : options.modules) {
+        modules.Load(module);
+    }
+    RaiseDescriptorLimit();
+    webapi::Listener listener(options.socket.empty() ? installation.WebApiSocket()
+                                                     : std::filesystem::path(options.socket));
+    webapi::Server server(installation, modules, listener.TakeSocket(), options.limits);
+    base::LogInfo("serving on " + listener.Name());
+    server.Run();
+}
+
+}  // namespace
+
+int main(int count, char** arguments) {
+    webapi::OpenStandardDescriptors();
+    base::SetLogProgram("webapi");
+    Options options;
+    CLI::App app("Hosts web API modules behind a web server that speaks SCGI.");
+    Describe(app, options);
+    CLI11_PARSE(app, count, arguments);
+    try {
+        Run(options);
+    } catch (const std::exception& error) {
+        base::LogError(error.what());
+        return EX_UNAVAILABLE;
+    }
+    return EXIT_SUCCESS;
+}

@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The request processes that are running, and the road on which each of them leaves.
+//
+// Why so        A module's stream looks at a flag and then waits: a signal between the two goes unseen. So a process that
+//               is to leave gets SIGTERM again and again, and SIGKILL when it does not go.
+// Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
+//               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
+// Thread safety One thread.
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <map>
+#include <optional>
+
+#include <sys/types.h>
+
+#include "standalone/base/file_descriptor.h"
+#include "standalone/webapi/slot_table.h"
+
+namespace lookhaven::webapi {
+
+using Clock = std::chrono::steady_clock;
+
+struct ProcessLimits {
+    std::chrono::milliseconds answer{30'000};  // for a request that turns out not to be a stream
+    std::chrono::milliseconds leave{15'000};   // from the first SIGTERM to SIGKILL
+    std::chrono::milliseconds repeat{100};
+};
+
+class ProcessTable {
+  public:
+    explicit ProcessTable(ProcessLimits limits) : limits_(limits) {}
+
+    struct Started {
+        pid_t pid;
+        int pidfd;  // readable once the process has ended; then call Reap
+    };
+    // Forks a process that calls run, which must not return, and takes the connection. Nothing, and the connection is
+    // still the caller's, when no process is to be had. Call it with all signals blocked.
+    std::optional<Started> Start(base::FileDescriptor& connection, Slot& slot, const std::function<void()>& run);
+
+    // The process's client is gone: tells the process to leave.
+    void HangUp(pid_t pid);
+    void LeaveAll();
+    // Those whose session has ended.
+    void LeaveEnded();
+    // Takes in that the process has ended.
+    void Reap(pid_t pid);
+
+    // Sends what is due; returns when to come again.
+    Clock::time_point SendDueSignals(Clock::time_point now);
+
+    bool IsEmpty() const { return processes_.empty(); }
+
+  private:
+    struct Process {
+        base::FileDescriptor connection;
+        base::FileDescriptor pidfd;
+        Slot* slot = nullptr;
+        Clock::time_point began;
+        std::optional<Clock::time_point> leaves_since;
+        Clock::time_point next_signal;
+    };
+
+    static void BeginLeaving(Process& process);
+
+    ProcessLimits limits_;
+    std::map<pid_t, Process> processes_;
+};
+
+}  // namespace lookhaven::webapi
