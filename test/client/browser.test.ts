@@ -31,7 +31,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     server.hasSession = false;
     server.stalled.clear();
     server.cameras.length = 0;
-    for (let id = 1; id <= cameras; id += 1) server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: id === 2 ? 3 : 1 });
+    for (let id = 1; id <= cameras; id += 1)
+      server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: id === 2 ? 3 : 1 });
     const page = await browser.open(address, widthPx, heightPx);
     await page.until(() => document.querySelector(".login") !== null);
     await page.run(() => {
@@ -76,8 +77,14 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const page = await loggedIn(3);
     await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
     server.stalled.add(3);
-    await page.until(() => /^No signal since \d\d:\d\d:\d\d$/.test(document.querySelector("[data-camera='3'] .message-sentence")!.textContent!));
-    expect(await page.run(() => document.querySelector(".wall-count")!.textContent)).toBe("3 cameras · 1 without signal");
+    await page.until(() =>
+      /^No signal since \d\d:\d\d:\d\d$/.test(
+        document.querySelector("[data-camera='3'] .message-sentence")!.textContent!,
+      ),
+    );
+    expect(await page.run(() => document.querySelector(".wall-count")!.textContent)).toBe(
+      "3 cameras · 1 without signal",
+    );
     expect(await page.run(() => document.querySelector("[data-camera='1']")!.getAttribute("data-state"))).toBe("live");
     server.stalled.clear();
     await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
@@ -92,12 +99,16 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const shown = () => document.querySelector(".large-name")?.textContent ?? "";
     await vi.waitFor(async () => expect(await page.run(shown)).toBe("Camera <b>3</b>"));
     await page.press("s");
-    await page.until(() => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false);
+    await page.until(
+      () => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false,
+    );
     await page.press("Escape");
     await page.until(() => !document.querySelector("dialog")!.open);
     await page.press("ArrowLeft");
     expect(await page.run(shown)).toBe("Camera <b>2</b>");
-    await page.until(() => document.querySelector(".large .message-sentence")!.textContent === "Live view is not available yet");
+    await page.until(
+      () => document.querySelector(".large .message-sentence")!.textContent === "Live view is not available yet",
+    );
     await page.press("Escape");
     await page.until(() => document.activeElement?.closest(".tile")?.getAttribute("data-camera") === "2");
     expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
@@ -112,13 +123,16 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.send("Page.close", {});
     const other = await loggedIn(4);
     server.hasSession = false;
-    await other.until(() => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.");
+    await other.until(
+      () => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.",
+    );
     await leave(other);
   }, 40_000);
 
   test("a phone shows one column, and nothing too small for a finger", async () => {
     const page = await loggedIn(4, 390, 844);
-    const columns = () => new Set([...document.querySelectorAll(".tile")].map((tile) => tile.getBoundingClientRect().left)).size;
+    const columns = () =>
+      new Set([...document.querySelectorAll(".tile")].map((tile) => tile.getBoundingClientRect().left)).size;
     expect(await page.run(columns)).toBe(1);
     const small = () =>
       [...document.querySelectorAll("button, a")]

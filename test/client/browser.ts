@@ -9,8 +9,14 @@ import { join } from "node:path";
 import type { Readable, Writable } from "node:stream";
 
 const kChromium = "/usr/bin/chromium";
-const kFlags = ["--headless", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run", "--remote-debugging-pipe"]
-  .concat(["--disable-background-networking", "--disable-component-update", "--disable-sync"]);
+const kFlags = [
+  "--headless",
+  "--no-sandbox",
+  "--disable-gpu",
+  "--disable-quic",
+  "--no-first-run",
+  "--remote-debugging-pipe",
+].concat(["--disable-background-networking", "--disable-component-update", "--disable-sync"]);
 
 export const hasBrowser = existsSync(kChromium);
 
@@ -91,7 +97,10 @@ export class Page {
     return (result as { value: Awaited<Result> }).value;
   }
 
-  async until<Arguments extends unknown[]>(condition: (...given: Arguments) => boolean, ...given: Arguments): Promise<void> {
+  async until<Arguments extends unknown[]>(
+    condition: (...given: Arguments) => boolean,
+    ...given: Arguments
+  ): Promise<void> {
     await vi.waitFor(async () => expect(await this.run(condition, ...given), String(condition)).toBe(true), {
       timeout: 12_000,
       interval: 50,
@@ -104,10 +113,28 @@ export class Page {
 
   async press(key: string): Promise<void> {
     const text = key.length === 1 ? { text: key } : key === "Enter" ? { text: "\r" } : {};
-    await this.send("Input.dispatchKeyEvent", { type: "keyDown", key, code: key, windowsVirtualKeyCode: kCodes[key] ?? 0, ...text });
-    await this.send("Input.dispatchKeyEvent", { type: "keyUp", key, code: key, windowsVirtualKeyCode: kCodes[key] ?? 0 });
+    await this.send("Input.dispatchKeyEvent", {
+      type: "keyDown",
+      key,
+      code: key,
+      windowsVirtualKeyCode: kCodes[key] ?? 0,
+      ...text,
+    });
+    await this.send("Input.dispatchKeyEvent", {
+      type: "keyUp",
+      key,
+      code: key,
+      windowsVirtualKeyCode: kCodes[key] ?? 0,
+    });
   }
 }
 
 /** Chromium acts by itself only on keys that come with their number. */
-const kCodes: Record<string, number> = { Enter: 13, Escape: 27, ArrowLeft: 37, ArrowUp: 38, ArrowRight: 39, ArrowDown: 40 };
+const kCodes: Record<string, number> = {
+  Enter: 13,
+  Escape: 27,
+  ArrowLeft: 37,
+  ArrowUp: 38,
+  ArrowRight: 39,
+  ArrowDown: 40,
+};

@@ -19,17 +19,35 @@ const live = (server: Server) => server.live(1, 1, new AbortController().signal)
 
 test.each([
   ["a handler's error with HTTP 200", cameras, () => json(200, failure(400)), "The server refused.", false],
-  ["the host's own sentence", cameras, () => json(404, failure(404, "no such method")), "The server refused: no such method.", false],
+  [
+    "the host's own sentence",
+    cameras,
+    () => json(404, failure(404, "no such method")),
+    "The server refused: no such method.",
+    false,
+  ],
   ["a proxy's error page", cameras, () => html(502), "The server could not answer (502).", false],
   ["JSON that is none", cameras, () => html(200), "The server's answer makes no sense.", false],
   ["JSON of another shape", cameras, () => json(200, []), "The server refused.", false],
   ["no connection", cameras, lost, "The server does not answer.", false],
   ["a session that ended", cameras, () => json(401, failure(401)), "You are not logged in.", true],
-  ["a wrong password, which ends no session", login, () => json(401, failure(401)), "The account or the password is wrong.", false],
+  [
+    "a wrong password, which ends no session",
+    login,
+    () => json(401, failure(401)),
+    "The account or the password is wrong.",
+    false,
+  ],
   ["throttled logins", login, () => html(429), "Too many attempts. Please wait a minute.", false],
   ["a snapshot without picture", snapshot, () => json(504, failure(504)), "The camera sends no picture.", false],
   ["a snapshot refused with HTTP 200", snapshot, () => json(200, failure(400)), "The server refused.", false],
-  ["a camera that cannot be opened", live, () => json(502, failure(502, "the handler gave no answer")), "No picture came.", false],
+  [
+    "a camera that cannot be opened",
+    live,
+    () => json(502, failure(502, "the handler gave no answer")),
+    "No picture came.",
+    false,
+  ],
   ["a stream whose session ended", live, () => json(401, failure(401)), "You are not logged in.", true],
   ["a stream too many", live, () => json(503, failure(503)), "The server is busy.", false],
 ])("says what went wrong: %s", async (_name, call, answer, message, endsSession) => {
@@ -40,7 +58,9 @@ test.each([
 });
 
 test("the password travels in the body, never in the address", async () => {
-  const fetched = vi.fn(async (_address: string, _init?: RequestInit) => json(200, { success: true, data: { account: "admin" } }));
+  const fetched = vi.fn(async (_address: string, _init?: RequestInit) =>
+    json(200, { success: true, data: { account: "admin" } }),
+  );
   vi.stubGlobal("fetch", fetched);
   expect(await new Server(() => undefined).login("ad&min", "p=1&x")).toEqual({ account: "admin" });
   const [address, init] = fetched.mock.calls[0]!;

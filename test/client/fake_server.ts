@@ -9,9 +9,15 @@ import type { AddressInfo } from "node:net";
 import { tmpdir } from "node:os";
 import { extname, join } from "node:path";
 
-const kPolicy = "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
+const kPolicy =
+  "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
   "frame-ancestors 'none'; require-trusted-types-for 'script'";
-const kTypes: Record<string, string> = { ".html": "text/html", ".js": "text/javascript", ".css": "text/css", ".svg": "image/svg+xml" };
+const kTypes: Record<string, string> = {
+  ".html": "text/html",
+  ".js": "text/javascript",
+  ".css": "text/css",
+  ".svg": "image/svg+xml",
+};
 const kFrameMs = 50;
 
 export class FakeServer {
@@ -30,7 +36,13 @@ export class FakeServer {
 
   async start(): Promise<string> {
     const client = join(__dirname, "../../client");
-    const vite = ["node_modules/vite/bin/vite.js", "build", "--logLevel=error", "--emptyOutDir", `--outDir=${this.#files}`];
+    const vite = [
+      "node_modules/vite/bin/vite.js",
+      "build",
+      "--logLevel=error",
+      "--emptyOutDir",
+      `--outDir=${this.#files}`,
+    ];
     execFileSync(process.execPath, vite, { cwd: client, env: { ...process.env, NODE_ENV: "production" } });
     await new Promise<void>((resolve) => this.#server.listen(0, "127.0.0.1", resolve));
     return `http://127.0.0.1:${(this.#server.address() as AddressInfo).port}/`;
@@ -51,8 +63,18 @@ export class FakeServer {
     if (method === "Logout") this.hasSession = false;
     if (method === "Play") return this.#play(searchParams, answer);
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
-    const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
-    json(answer, 200, { success: true, data: method === "LoadCamera" ? list : { account: "admin", user_id: 1, is_manager: true } });
+    const list = {
+      camera,
+      selected: 1,
+      isManager: true,
+      ShowAll: 1,
+      CamNum: camera.length,
+      EnableCamNum: camera.length,
+    };
+    json(answer, 200, {
+      success: true,
+      data: method === "LoadCamera" ? list : { account: "admin", user_id: 1, is_manager: true },
+    });
   }
 
   #file(path: string, answer: ServerResponse): void {
@@ -93,5 +115,7 @@ export class FakeServer {
 }
 
 function json(answer: ServerResponse, status: number, body: unknown): void {
-  answer.writeHead(status, { "Content-Type": "application/json", "Cache-Control": "no-store" }).end(JSON.stringify(body));
+  answer
+    .writeHead(status, { "Content-Type": "application/json", "Cache-Control": "no-store" })
+    .end(JSON.stringify(body));
 }

@@ -23,32 +23,70 @@ const first = { at: 100, does: "picture", captured: 7000 } as const;
 
 test.each<[string, Step[]]>([
   ["nothing is claimed before watching", [{ at: 9000, is: "idle" }]],
-  ["no picture ever: lost since watching began", [
-    { at: 1000, does: "begin" }, { at: 5999, is: "connecting" }, { at: 6000, is: "lost", since: kWallStartMs + 1000 },
-  ]],
-  ["a picture makes it live until the limit", [begin, first, { at: 5099, is: "live" }, { at: 5100, is: "lost", since: 7000 }]],
-  ["the same picture again is no sign of life", [
-    begin, first, { at: 4000, does: "picture", captured: 7000 }, { at: 5100, is: "lost", since: 7000 },
-  ]],
+  [
+    "no picture ever: lost since watching began",
+    [
+      { at: 1000, does: "begin" },
+      { at: 5999, is: "connecting" },
+      { at: 6000, is: "lost", since: kWallStartMs + 1000 },
+    ],
+  ],
+  [
+    "a picture makes it live until the limit",
+    [begin, first, { at: 5099, is: "live" }, { at: 5100, is: "lost", since: 7000 }],
+  ],
+  [
+    "the same picture again is no sign of life",
+    [begin, first, { at: 4000, does: "picture", captured: 7000 }, { at: 5100, is: "lost", since: 7000 }],
+  ],
   ["a new one is", [begin, first, { at: 4000, does: "picture", captured: 7001 }, { at: 8999, is: "live" }]],
-  ["an old picture just delivered is lost at once", [
-    begin, { at: 100, does: "picture", captured: 7000, age: 6000 }, { at: 101, is: "lost", since: 7000 },
-  ]],
-  ["a broken connection is reconnected quietly within the limit, then named", [
-    begin, first, { at: 200, does: "broke" }, { at: 201, is: "connecting" }, { at: 5100, is: "lost", since: 7000, reason: "why" },
-  ]],
-  ["an attempt to reconnect does not hide the loss, a picture does", [
-    begin, { at: 6000, does: "begin" }, { at: 6001, is: "lost", since: kWallStartMs },
-    { at: 6002, does: "picture", captured: 7000 }, { at: 6003, is: "live" },
-  ]],
-  ["a camera that slept behind a hidden tab is not called lost for that time", [
-    begin, first, { at: 200, does: "end" }, { at: 9000, is: "idle" }, { at: 9000, does: "begin" }, { at: 9001, is: "connecting" },
-    { at: 14000, is: "lost", since: kWallStartMs + 9000 },
-  ]],
-  ["after that, even the same capture counts: it was not seen since", [
-    begin, first, { at: 200, does: "end" }, { at: 300, does: "begin" }, { at: 400, does: "picture", captured: 7000 },
-    { at: 401, is: "live" },
-  ]],
+  [
+    "an old picture just delivered is lost at once",
+    [begin, { at: 100, does: "picture", captured: 7000, age: 6000 }, { at: 101, is: "lost", since: 7000 }],
+  ],
+  [
+    "a broken connection is reconnected quietly within the limit, then named",
+    [
+      begin,
+      first,
+      { at: 200, does: "broke" },
+      { at: 201, is: "connecting" },
+      { at: 5100, is: "lost", since: 7000, reason: "why" },
+    ],
+  ],
+  [
+    "an attempt to reconnect does not hide the loss, a picture does",
+    [
+      begin,
+      { at: 6000, does: "begin" },
+      { at: 6001, is: "lost", since: kWallStartMs },
+      { at: 6002, does: "picture", captured: 7000 },
+      { at: 6003, is: "live" },
+    ],
+  ],
+  [
+    "a camera that slept behind a hidden tab is not called lost for that time",
+    [
+      begin,
+      first,
+      { at: 200, does: "end" },
+      { at: 9000, is: "idle" },
+      { at: 9000, does: "begin" },
+      { at: 9001, is: "connecting" },
+      { at: 14000, is: "lost", since: kWallStartMs + 9000 },
+    ],
+  ],
+  [
+    "after that, even the same capture counts: it was not seen since",
+    [
+      begin,
+      first,
+      { at: 200, does: "end" },
+      { at: 300, does: "begin" },
+      { at: 400, does: "picture", captured: 7000 },
+      { at: 401, is: "live" },
+    ],
+  ],
 ])("signal: %s", (_name, steps) => {
   let nowMs = 0;
   const judge = new SignalJudge({ steadyMs: () => nowMs, wallMs: () => kWallStartMs + nowMs });
@@ -100,12 +138,14 @@ test("turns: one at a time in order, a failure or a leaver blocks nobody", async
   const log: string[] = [];
   const stay = new AbortController();
   const leave = new AbortController();
-  const work = (name: string, fails = false) => async () => {
-    log.push(`${name} in`);
-    await Promise.resolve();
-    log.push(`${name} out`);
-    if (fails) throw new Error(name);
-  };
+  const work =
+    (name: string, fails = false) =>
+    async () => {
+      log.push(`${name} in`);
+      await Promise.resolve();
+      log.push(`${name} out`);
+      if (fails) throw new Error(name);
+    };
   const all = [
     turns.run(stay.signal, work("a", true)),
     turns.run(leave.signal, work("b")),
@@ -131,9 +171,15 @@ test("pictures that come while one is being decoded give way to the newest; a ba
 });
 
 test.each([
-  [{ "x-capture-time": "1764023456.123", "x-age-ms": "40" }, { capturedMs: 1764023456123, ageMs: 40 }],
+  [
+    { "x-capture-time": "1764023456.123", "x-age-ms": "40" },
+    { capturedMs: 1764023456123, ageMs: 40 },
+  ],
   [{}, { capturedMs: 99, ageMs: 0 }],
-  [{ "x-capture-time": "soon", "x-age-ms": "-5" }, { capturedMs: 99, ageMs: 0 }],
+  [
+    { "x-capture-time": "soon", "x-age-ms": "-5" },
+    { capturedMs: 99, ageMs: 0 },
+  ],
 ])("capture of %j", (headers, capture) => {
   expect(captureOf(new Map(Object.entries(headers)), 99)).toEqual(capture);
 });
@@ -164,7 +210,12 @@ test.each([
   const fake = serverWith(working, status);
   const source = new MjpegSource(fake.server, 1, true);
   for (let run = 0; run < 2; run += 1) {
-    const failed = await source.run(() => undefined, new AbortController().signal).then(() => false, () => true);
+    const failed = await source
+      .run(() => undefined, new AbortController().signal)
+      .then(
+        () => false,
+        () => true,
+      );
     expect(failed).toBe(working.length === 0);
   }
   expect(fake.asked).toEqual(asked);

@@ -11,7 +11,7 @@ function parse(text: string, pieceBytes = () => text.length): Part[] {
   const parts: Part[] = [];
   const parser = new MultipartParser("b", (part) => parts.push(part));
   const bytes = latin1(text);
-  for (let at = 0; at < bytes.length; ) {
+  for (let at = 0; at < bytes.length;) {
     const end = at + pieceBytes();
     parser.push(bytes.subarray(at, end));
     at = end;

@@ -51,7 +51,10 @@ export class Grid {
     this.#server = server;
     this.#actions = actions;
     this.#limit = streamLimit(protocol());
-    this.#observer = new IntersectionObserver((entries) => this.#see(entries), { root: this.root, threshold: kSeenPart });
+    this.#observer = new IntersectionObserver((entries) => this.#see(entries), {
+      root: this.root,
+      threshold: kSeenPart,
+    });
     this.#resized.observe(this.root);
     document.addEventListener("visibilitychange", this.#assignSoon);
     this.root.addEventListener("keydown", (event) => this.#onKey(event));
@@ -59,7 +62,9 @@ export class Grid {
 
   /** Shows these cameras in this order; the tiles of cameras that stay go on without a break. */
   setCameras(cameras: readonly Camera[]): void {
-    const unchanged = new Map([...this.#tiles].filter(([, tile]) => cameras.some((camera) => same(camera, tile.camera))));
+    const unchanged = new Map(
+      [...this.#tiles].filter(([, tile]) => cameras.some((camera) => same(camera, tile.camera))),
+    );
     for (const [id, tile] of this.#tiles) if (!unchanged.has(id)) this.#remove(tile);
     for (const camera of cameras) {
       if (unchanged.has(camera.id)) continue;

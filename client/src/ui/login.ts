@@ -8,7 +8,12 @@ import { icon } from "./icons";
 
 /** `hint` says why the user is here again, if there is a reason. */
 export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => void): HTMLElement {
-  const account = field("account", "Account", { type: "text", autocomplete: "username", autocapitalize: "none", spellcheck: "false" });
+  const account = field("account", "Account", {
+    type: "text",
+    autocomplete: "username",
+    autocapitalize: "none",
+    spellcheck: "false",
+  });
   const password = field("password", "Password", { type: "password", autocomplete: "current-password" });
   const submit = element("button", { type: "submit", class: "button primary" }, "Log in");
   const message = element("p", { class: "login-message", role: "alert" }, hint);
@@ -44,6 +49,6 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
 }
 
 function field(name: string, label: string, attributes: Record<string, string>) {
-  const input = element("input", { id: name, name, required: false, ...attributes });
+  const input = element("input", { id: name, name, ...attributes });
   return { input, row: element("label", { class: "field", for: name }, element("span", {}, label), input) };
 }

@@ -28,7 +28,12 @@ export class SnapshotDialog {
   async take(camera: Camera): Promise<void> {
     this.#clear();
     const request = (this.#request = new AbortController());
-    const waiting = element("div", { class: "snapshot-wait" }, element("div", { class: "spinner" }), "Taking a snapshot…");
+    const waiting = element(
+      "div",
+      { class: "snapshot-wait" },
+      element("div", { class: "spinner" }),
+      "Taking a snapshot…",
+    );
     this.#fill(camera, "", waiting);
     if (!this.root.open) this.root.showModal();
     try {
@@ -41,7 +46,11 @@ export class SnapshotDialog {
       const message = error instanceof ServerError ? error.message : "The picture cannot be shown.";
       const again = element("button", { type: "button", class: "button" }, "Try again");
       again.addEventListener("click", () => void this.take(camera));
-      this.#fill(camera, "", element("div", { class: "snapshot-wait", role: "alert" }, icon("warning"), message, again));
+      this.#fill(
+        camera,
+        "",
+        element("div", { class: "snapshot-wait", role: "alert" }, icon("warning"), message, again),
+      );
       again.focus();
     }
   }
@@ -51,9 +60,19 @@ export class SnapshotDialog {
     const canvas = element("canvas", { role: "img", "aria-label": `Snapshot of ${camera.name}` });
     draw(canvas, image);
     this.#fileAddress = URL.createObjectURL(snapshot.jpeg);
-    const save = element("a", { class: "button primary", href: this.#fileAddress, download: name }, icon("download"), "Download");
+    const save = element(
+      "a",
+      { class: "button primary", href: this.#fileAddress, download: name },
+      icon("download"),
+      "Download",
+    );
     const size = `${image.width} × ${image.height} · ${Math.ceil(snapshot.jpeg.size / 1024)} KB`;
-    const foot = element("footer", { class: "snapshot-foot" }, element("span", { class: "quiet" }, name, element("br"), size), save);
+    const foot = element(
+      "footer",
+      { class: "snapshot-foot" },
+      element("span", { class: "quiet" }, name, element("br"), size),
+      save,
+    );
     this.#fill(camera, `${calendarDate(snapshot.takenMs)} ${clockTime(snapshot.takenMs)}`, canvas, foot);
     save.focus();
   }

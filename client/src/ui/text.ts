@@ -20,7 +20,10 @@ export function calendarDate(unixMs: number): string {
 
 /** A file name that every file system takes: the camera's name and the time, without characters that some refuse. */
 export function snapshotFileName(cameraName: string, takenMs: number): string {
-  const plain = cameraName.replace(/[\u0000-\u001f\u007f/\\:*?"<>|]+/g, " ").trim().replace(/\s+/g, "-");
+  const plain = cameraName
+    .replace(/[\u0000-\u001f\u007f/\\:*?"<>|]+/g, " ")
+    .trim()
+    .replace(/\s+/g, "-");
   const name = plain.replace(/^[.-]+|[.-]+$/g, "") || "camera";
   return `${name}_${calendarDate(takenMs)}_${clockTime(takenMs).replaceAll(":", "-")}.jpg`;
 }

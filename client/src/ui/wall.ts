@@ -52,7 +52,10 @@ export class Wall {
     this.#server = server;
     this.#onLogout = onLogout;
     this.#dialog = new SnapshotDialog(server);
-    this.#grid = new Grid(server, { open: (camera) => showCamera(camera.id), snapshot: (camera) => this.#snapshot(camera) });
+    this.#grid = new Grid(server, {
+      open: (camera) => showCamera(camera.id),
+      snapshot: (camera) => this.#snapshot(camera),
+    });
     this.#front = element("div", { class: "wall" }, this.#bar(account), this.#progress, this.#message, this.#grid.root);
     this.root = element("main", { class: "screen" }, this.#front, this.#dialog.root);
     addEventListener("popstate", this.#onRoute);
@@ -115,7 +118,8 @@ export class Wall {
     this.#grid.setCameras(this.#cameras);
     if (this.#cameras.length > 0) this.#message.replaceChildren();
     else if (list.CamNum > 0) this.#showMessage("camera", "No camera is switched on.", false);
-    else if (list.isManager) this.#showMessage("camera", "No camera yet. “lookhaven camera add” on the server adds one.", false);
+    else if (list.isManager)
+      this.#showMessage("camera", "No camera yet. “lookhaven camera add” on the server adds one.", false);
     else this.#showMessage("camera", "There is no camera for you to see yet.", false);
     this.#followRoute();
   }
@@ -209,6 +213,8 @@ export class Wall {
 /** The whole page goes full screen, so that the user can go from camera to camera there. */
 function toggleFullScreen(): void {
   // Refused where the browser has none: then nothing changes.
-  const change = document.fullscreenElement ? document.exitFullscreen() : document.documentElement.requestFullscreen?.();
+  const change = document.fullscreenElement
+    ? document.exitFullscreen()
+    : document.documentElement.requestFullscreen?.();
   change?.catch(() => undefined);
 }
