@@ -102,7 +102,7 @@ void Writer::Ring::Open() {
 // Takes over a dead writer's segment. False when another one is to be made in its stead.
 bool Writer::Ring::Adopt(FoundSegment& found) {
     if (found.check != SegmentCheck::kGood) {
-        base::LogWarning("ring of " + Name(id_) + " has another layout: replaced");
+        base::LogWarning("ring of " + Name(id_) + " has another layout or is damaged: replaced");
         found.attachment.RemoveSegment();
         return false;
     }

@@ -1,0 +1,286 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What one reader sees: the order of entries, where it continues after a gap, how it waits, what stays while it sends.
+#include <chrono>
+#include <ctime>
+#include <optional>
+#include <thread>
+
+#include <gmock/gmock.h>
+#include <pthread.h>
+#include <sys/shm.h>
+
+#include "standalone/base/clock.h"
+#include "test/component/ring/ring_fixture.h"
+
+namespace lookhaven::ring {
+namespace {
+
+const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
+const StreamFormat kH264{"H264", {1, 2, 3}, 1280, 720, false};
+const StreamId kVideo{7, 1, Medium::kVideo};
+const StreamId kAudio{7, 1, Medium::kAudio};
+
+class ReadingTest : public RingTest {
+  protected:
+    void Open(const StreamId& id, const StreamFormat& format, const Geometry& geometry) {
+        writer_.emplace(installation_, id, format, geometry);
+        ring_ = Attach(installation_, id);
+        ASSERT_NE(ring_, nullptr);
+        StartRead(ring_, &position_);
+    }
+    void TearDown() override {
+        Detach(ring_);
+        writer_.reset();
+    }
+
+    // The frame's data follows from its count.
+    bool Write(std::size_t size_bytes = 64, bool is_key = true) {
+        const auto data = MakeData(size_bytes, written_ + 1);
+        const bool done = writer_->Write({.data = data, .is_key = is_key, .timestamp_micros = 1, .capture_millis = 2});
+        written_ += done ? 1 : 0;
+        return done;
+    }
+    // Writes key and other frames as the letters say: K, p.
+    void WriteGroup(std::string_view kinds) {
+        for (const char kind : kinds) {
+            ASSERT_TRUE(Write(64, kind == 'K'));
+        }
+    }
+    static std::uint64_t CountOf(const Entry* entry) { return entry == nullptr ? 0 : entry->Count(); }
+    // Reads and gives back at once.
+    std::uint64_t Next(int last) {
+        const Entry* entry = ReadNext(ring_, last, &position_);
+        const std::uint64_t count = CountOf(entry);
+        ReadFinish(ring_, entry, &position_);
+        return count;
+    }
+    std::uint64_t Latest(int last) {
+        const Entry* entry = ReadLatest(ring_, last, &position_, 0);
+        const std::uint64_t count = CountOf(entry);
+        ReadFinish(ring_, entry, &position_);
+        return count;
+    }
+
+    std::optional<Writer> writer_;
+    void* ring_ = nullptr;
+    Position position_;
+    std::uint64_t written_ = 0;
+};
+
+TEST_F(ReadingTest, NumbersRunToTenThousandAndBeginAgainWithoutAGapForTheReader) {
+    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    int last = kNoSequence;
+    for (int i = 0; i < 20'005; ++i) {
+        ASSERT_TRUE(Write());
+        const Entry* entry = ReadNext(ring_, last, &position_);
+        ASSERT_NE(entry, nullptr) << i;
+        ASSERT_EQ(entry->sequence, i % 10'001);
+        ASSERT_EQ(entry->Count(), static_cast<std::uint64_t>(i) + 1);
+        last = entry->sequence;
+        ReadFinish(ring_, entry, &position_);
+        ASSERT_EQ(ReadNext(ring_, last, &position_), nullptr);
+        ASSERT_EQ(ReadLatest(ring_, last, &position_, 0), nullptr);
+    }
+    for (int i = 0; i < 10'001; ++i) {
+        ASSERT_TRUE(Write());
+    }
+    EXPECT_EQ(Latest(last), written_) << "the same number after a whole round is another frame";
+}
+
+TEST_F(ReadingTest, ReadNextContinuesWhereTheStreamCanBeUnderstood) {
+    struct Row {
+        const char* name;
+        const StreamId* id;
+        const StreamFormat* format;
+        const char* kinds;  // eight slots hold the last eight
+        int last;
+        std::uint64_t expected;
+    };
+    const StreamFormat audio{"AAC", {}, 0, 0, false};
+    for (const Row& row : {
+             Row{"nothing read: newest key frame", &kVideo, &kH264, "KppKpp", kNoSequence, 4},
+             Row{"nothing read: newest of audio", &kAudio, &audio, "pppppp", kNoSequence, 6},
+             Row{"nothing read: newest of MJPEG", &kVideo, &kMjpeg, "KKKKKK", kNoSequence, 6},
+             Row{"in the ring: the one after", &kVideo, &kH264, "KppKpp", 1, 3},
+             Row{"newest read: none", &kVideo, &kH264, "KppKpp", 5, 0},
+             Row{"left the ring: newest key frame", &kVideo, &kH264, "KppKppKppKpp", 2, 10},
+             Row{"left the ring: newest of audio", &kAudio, &audio, "pppppppppppp", 2, 12},
+             Row{"left the ring, no key frame in it: none", &kVideo, &kH264, "Kppppppppppp", 1, 0},
+             Row{"a number never given", &kVideo, &kH264, "KppKpp", 9000, 4},
+             Row{"no number at all", &kVideo, &kH264, "KppKpp", -3, 4},
+             Row{"empty", &kVideo, &kH264, "", kNoSequence, 0},
+         }) {
+        SCOPED_TRACE(row.name);
+        Open(*row.id, *row.format, {.index_slots = 8, .arena_bytes = 1 << 16});
+        WriteGroup(row.kinds);
+        EXPECT_EQ(Next(row.last), row.expected);
+        const Entry* loose = ReadNext(ring_, row.last, nullptr);
+        EXPECT_EQ(CountOf(loose), row.expected) << "without a position";
+        ReadFinish(ring_, loose, nullptr);
+        TearDown();
+    }
+    ring_ = nullptr;
+}
+
+TEST_F(ReadingTest, ASlowReaderGetsTheNewestFrameAndSkips) {
+    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 20});
+    ASSERT_TRUE(Write(30'000));
+    const Entry* held = ReadLatest(ring_, kNoSequence, &position_, 0);
+    ASSERT_NE(held, nullptr);
+    for (int i = 0; i < 500; ++i) {
+        ASSERT_TRUE(Write(20'000 + static_cast<std::size_t>(i) * 40)) << "the writer goes round what is held";
+        ASSERT_TRUE(IsFilled(*held, 1)) << "overwritten while it was sent, after " << i << " frames";
+    }
+    EXPECT_EQ(held->length, 30'000);
+    ReadFinish(ring_, held, &position_);
+    EXPECT_EQ(Latest(0), 501U);
+}
+
+TEST_F(ReadingTest, OnlyWhatReadersHoldCanLeaveNoRoomAndOnlyForAsLong) {
+    Open(kVideo, kH264, {.index_slots = 64, .arena_bytes = 1 << 16});
+    std::vector<Position> positions(4);
+    for (Position& position : positions) {
+        ASSERT_TRUE(Write(14'000));
+        StartRead(ring_, &position);
+        ASSERT_NE(ReadLatest(ring_, kNoSequence, &position, 0), nullptr);
+    }
+    EXPECT_FALSE(Write(14'000));
+    ReadFinish(ring_, nullptr, &positions[1]);
+    EXPECT_FALSE(Write(14'000, false)) << "what follows a lost frame cannot be understood";
+    EXPECT_TRUE(Write(14'000, true));
+    EXPECT_EQ(writer_->DroppedFrames(), 2U);
+    EXPECT_EQ(Latest(3), 5U) << "dropped frames take no number";
+}
+
+TEST_F(ReadingTest, LooseEntriesAreHeldUntilTheyAreGivenBackAndTakeNoPlaceAfterwards) {
+    Open(kVideo, kH264, {.index_slots = 64, .arena_bytes = 1 << 16});
+    EXPECT_EQ(ReadLatest(ring_), nullptr);
+    EXPECT_EQ(ReadLatestIFrame(ring_), nullptr);
+    WriteGroup("KppKp");
+    const Entry* newest = ReadLatest(ring_);
+    const Entry* key = ReadLatestIFrame(ring_);
+    EXPECT_EQ(CountOf(newest), 5U);
+    EXPECT_EQ(CountOf(key), 4U);
+    EXPECT_EQ(key->flags, kKeyFrame);
+    EXPECT_EQ(newest->flags, 0U);
+    EXPECT_EQ(newest->TimestampMicros(), 1);
+    EXPECT_EQ(newest->CaptureMillis(), 2);
+    for (int i = 0; i < 50; ++i) {
+        ASSERT_TRUE(Write(9'000));
+    }
+    EXPECT_TRUE(IsFilled(*newest, 5) && IsFilled(*key, 4));
+    EXPECT_EQ(ListSegments(installation_)[0].readers, 3U);
+    ReadFinish(ring_, newest, nullptr);
+    ReadIFrameFinish(ring_, key, nullptr);
+    ReadFinish(ring_, nullptr, nullptr);
+    ReadIFrameFinish(ring_, nullptr, nullptr);
+    ASSERT_NE(ReadLatest(ring_), nullptr);
+    StopRead(ring_, nullptr);
+    StopRead(ring_, &position_);
+    EXPECT_EQ(ListSegments(installation_)[0].readers, 0U);
+    EXPECT_EQ(Latest(kNoSequence), 0U) << "a position that has stopped reads nothing";
+}
+
+TEST_F(ReadingTest, WaitingEndsWithTheFrameTheSignalOrTheTimeAndDoesNotSpin) {
+    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    ASSERT_TRUE(Write());
+    struct sigaction interrupt {};
+    interrupt.sa_handler = [](int) {};
+    ::sigaction(SIGUSR1, &interrupt, nullptr);
+    const pthread_t reader = pthread_self();
+    struct Row {
+        const char* name;
+        int after_ms;
+        bool writes;
+        bool signals;
+        int wait_ms;
+        int least_ms;
+        int most_ms;
+    };
+    // The upper bounds leave room for a machine that is busy otherwise.
+    for (const Row& row :
+         {Row{"frame", 20, true, false, 100, 15, 95}, Row{"signal", 20, false, true, 100, 15, 95},
+          Row{"time", 0, false, false, 60, 60, 400}, Row{"longest time", 0, false, false, 5000, 100, 400},
+          Row{"no wait", 0, false, false, 0, 0, 20}}) {
+        SCOPED_TRACE(row.name);
+        const int last = static_cast<int>(written_) - 1;
+        std::timespec cpu_before{};
+        clock_gettime(CLOCK_THREAD_CPUTIME_ID, &cpu_before);
+        const std::int64_t begin = base::MonotonicMicros();
+        std::thread other([&] {
+            std::this_thread::sleep_for(std::chrono::milliseconds(row.after_ms));
+            if (row.writes) {
+                Write();
+            }
+            if (row.signals) {
+                pthread_kill(reader, SIGUSR1);
+            }
+        });
+        const Entry* entry = ReadLatest(ring_, last, &position_, row.wait_ms);
+        const std::int64_t took_ms = (base::MonotonicMicros() - begin) / 1000;
+        std::timespec cpu_after{};
+        clock_gettime(CLOCK_THREAD_CPUTIME_ID, &cpu_after);
+        other.join();
+        EXPECT_EQ(entry != nullptr, row.writes);
+        EXPECT_GE(took_ms, row.least_ms);
+        EXPECT_LE(took_ms, row.most_ms);
+        EXPECT_LT(cpu_after.tv_nsec - cpu_before.tv_nsec + (cpu_after.tv_sec - cpu_before.tv_sec) * 1'000'000'000,
+                  10'000'000)
+            << "it spins";
+        ReadFinish(ring_, entry, &position_);
+    }
+}
+
+TEST_F(ReadingTest, AForkedChildReadsNothingThroughItsParentsPositionAndLeavesItsPinAlone) {
+    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    ASSERT_TRUE(Write(9'000));
+    const Entry* held = ReadLatest(ring_, kNoSequence, &position_, 0);
+    ASSERT_NE(held, nullptr);
+    const int status = WaitFor(InChild([&] {
+        const bool reads = ReadLatest(ring_, kNoSequence, &position_, 0) != nullptr;
+        ReadFinish(ring_, nullptr, &position_);
+        StopRead(ring_, &position_);
+        ::_exit(reads ? 1 : 0);
+    }));
+    EXPECT_EQ(status, 0);
+    for (int i = 0; i < 50; ++i) {
+        ASSERT_TRUE(Write(9'000));
+    }
+    EXPECT_TRUE(IsFilled(*held, 1));
+}
+
+TEST_F(ReadingTest, FramesAndFormatsAreTakenWithinTheirBounds) {
+    Open(kVideo, {std::string(40, 'c'), std::vector<unsigned char>(1025), 1, 2, true}, {64, 1 << 16});
+    EXPECT_EQ(std::string(Codec(ring_)), std::string(31, 'c'));
+    EXPECT_TRUE(ExtraData(ring_).empty());
+    struct Row {
+        std::size_t size_bytes;
+        int offset;
+        bool expected;
+    };
+    for (const Row& row : {Row{0, 0, false}, Row{1, 0, true}, Row{10, 9, true}, Row{10, 10, false}, Row{10, -1, false},
+                           Row{4194303, 0, true}, Row{4194304, 0, false}}) {
+        const auto data = MakeData(row.size_bytes, 1);
+        EXPECT_EQ(writer_->Write({.data = data, .offset = row.offset}), row.expected)
+            << row.size_bytes << " bytes, offset " << row.offset;
+    }
+    const Entry* largest = ReadLatest(writer_->Address());
+    ASSERT_NE(largest, nullptr);
+    EXPECT_TRUE(IsFilled(*largest, 1));
+    StopRead(writer_->Address(), nullptr);
+
+    writer_->SetFormat({"H264", std::vector<unsigned char>(1024, 9), 640, 360, false});
+    EXPECT_THAT(ExtraData(writer_->Address()), testing::AllOf(testing::SizeIs(1024), testing::Each(9)));
+    EXPECT_EQ(Width(writer_->Address()) * 1000 + Height(writer_->Address()), 640'360);
+
+    void* silence = AttachEmpty(kAudio, {"AAC", {7}, 0, 0, true});
+    EXPECT_STREQ(Codec(silence), "AAC");
+    Position position;
+    StartRead(silence, &position);
+    EXPECT_EQ(ReadNext(silence, kNoSequence, &position), nullptr);
+    EXPECT_EQ(::shmdt(silence), 0);
+}
+
+}  // namespace
+}  // namespace lookhaven::ring

@@ -1,0 +1,122 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A reader that trusts nothing: it checks each entry when it gets it and again before it gives it back.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <cstdlib>
+#include <iostream>
+#include <random>
+#include <thread>
+
+#include "test/component/ring/ring_fixture.h"
+
+namespace lookhaven::ring {
+
+// What all writers and readers of a run found; in shared memory where they are processes.
+struct Findings {
+    std::atomic<std::uint64_t> written{0};
+    std::atomic<std::uint64_t> dropped{0};
+    std::atomic<std::uint64_t> verified{0};
+    std::atomic<std::uint64_t> torn{0};
+    std::atomic<std::uint64_t> out_of_order{0};
+};
+
+// The environment's LOOKHAVEN_TORTURE_SEED, to repeat a run, else a new one; printed.
+inline std::uint64_t TortureSeed() {
+    const char* given = std::getenv("LOOKHAVEN_TORTURE_SEED");
+    const std::uint64_t seed = given != nullptr ? std::strtoull(given, nullptr, 10) : std::random_device{}();
+    std::cout << "LOOKHAVEN_TORTURE_SEED=" << seed << '\n';
+    return seed;
+}
+
+class TortureReader {
+  public:
+    TortureReader(void* ring, std::uint64_t seed, Findings& findings)
+        : ring_(ring),
+          random_(seed),
+          findings_(findings),
+          wants_every_frame_(random_() % 2 == 0) {
+        StartRead(ring_, &position_);
+    }
+    ~TortureReader() { StopRead(ring_, &position_); }
+    TortureReader(const TortureReader&) = delete;
+    TortureReader& operator=(const TortureReader&) = delete;
+
+    // One read of the kind that a live stream, a muxed stream or a snapshot does. A live stream waits a little.
+    void ReadOnce() {
+        if (random_() % 64 == 0) {
+            const Entry* entry = random_() % 2 == 0 ? ReadLatest(ring_) : ReadLatestIFrame(ring_);
+            Verify(entry);
+            ReadFinish(ring_, entry, nullptr);
+            return;
+        }
+        const Entry* entry = wants_every_frame_ ? ReadNext(ring_, last_, &position_) : nullptr;
+        if (entry == nullptr) {
+            entry = ReadLatest(ring_, last_, &position_, 5);
+        }
+        if (entry != nullptr) {
+            findings_.out_of_order += entry->Count() <= count_ ? 1 : 0;
+            count_ = entry->Count();
+            last_ = entry->sequence;
+        }
+        Verify(entry);
+        ReadFinish(ring_, entry, &position_);
+    }
+
+  private:
+    // The data follows from the timestamp, the number from the count.
+    void Verify(const Entry* entry) {
+        if (entry == nullptr) {
+            return;
+        }
+        const auto seed = static_cast<std::uint64_t>(entry->TimestampMicros());
+        const std::uint64_t count = entry->Count();
+        bool whole = IsFilled(*entry, seed);
+        if (random_() % 512 == 0) {
+            std::this_thread::sleep_for(std::chrono::microseconds(random_() % 2'000));
+        } else if (random_() % 8 == 0) {
+            std::this_thread::yield();
+        }
+        whole = whole && IsFilled(*entry, seed) && entry->Count() == count &&
+                static_cast<std::uint64_t>(entry->sequence) == (count - 1) % 10'001;
+        findings_.torn += whole ? 0 : 1;
+        ++findings_.verified;
+    }
+
+    void* ring_;
+    std::mt19937_64 random_;
+    Findings& findings_;
+    bool wants_every_frame_;
+    Position position_;
+    int last_ = kNoSequence;
+    std::uint64_t count_ = 0;
+};
+
+// Writes frames of random size, every tenth a key frame, and counts them.
+class TortureWriter {
+  public:
+    TortureWriter(Writer& writer, std::uint64_t seed, Findings& findings)
+        : writer_(writer),
+          random_(seed),
+          findings_(findings) {}
+
+    void WriteOnce(std::size_t most_bytes) {
+        const std::uint64_t seed = random_();
+        const std::span<unsigned char> data(buffer_, 8 + seed % (most_bytes - 8));
+        Fill(data, seed);
+        const bool is_written = writer_.Write(
+            {.data = data, .is_key = written_++ % 10 == 0, .timestamp_micros = static_cast<std::int64_t>(seed)});
+        ++(is_written ? findings_.written : findings_.dropped);
+    }
+
+  private:
+    Writer& writer_;
+    std::mt19937_64 random_;
+    Findings& findings_;
+    std::uint64_t written_ = 0;
+    unsigned char buffer_[65'536];
+};
+
+}  // namespace lookhaven::ring
