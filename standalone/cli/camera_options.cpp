@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/cli/camera_options.h"
+
+#include <algorithm>
+#include <charconv>
+#include <map>
+
+#include "standalone/cli/console.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+using store::Camera;
+using store::CameraProfile;
+using store::VideoType;
+
+const std::map<std::string, VideoType> kTypes = {
+    {"mjpeg", VideoType::kMjpeg}, {"h264", VideoType::kH264}, {"h265", VideoType::kH265}};
+const std::map<std::string, int> kProfiles = {{"high", 0}, {"low", 1}, {"mobile", 2}};
+
+// "640x360"
+void ParseSize(const std::string& text, CameraProfile& profile) {
+    const char* end = text.data() + text.size();
+    const auto [after_width, width_error] = std::from_chars(text.data(), end, profile.width);
+    if (width_error == std::errc() && after_width != end && *after_width == 'x') {
+        const auto [after_height, height_error] = std::from_chars(after_width + 1, end, profile.height);
+        if (height_error == std::errc() && after_height == end) {
+            return;
+        }
+    }
+    throw Failure(kUsage, "a size looks like 1280x720");
+}
+
+CameraProfile& ProfileOf(Camera& camera, int number) {
+    auto place = std::lower_bound(camera.profiles.begin(), camera.profiles.end(), number,
+                                  [](const CameraProfile& profile, int wanted) { return profile.number < wanted; });
+    if (place == camera.profiles.end() || place->number != number) {
+        place = camera.profiles.insert(place, CameraProfile{number, "", 0, 0, 0});
+    }
+    return *place;
+}
+
+template <typename T>
+void AssignIfGiven(T& target, const std::optional<T>& given) {
+    target = given.value_or(target);
+}
+
+}  // namespace
+
+void CameraOptions::AddTo(CLI::App& command) {
+    command.add_option("--name", name_, "What the camera is called");
+    command.add_option("--type", type_, "mjpeg, h264 or h265 (else found out)")
+        ->transform(CLI::CheckedTransformer(kTypes));
+    command.add_option("--live", live_profile_, "The profile of the live view: high (at first), low or mobile")
+        ->transform(CLI::CheckedTransformer(kProfiles));
+    command.add_flag("--enable,!--disable", enabled_, "Whether it is shown and recorded");
+    command.add_flag("--ptz,!--no-ptz", ptz_, "Whether it moves");
+    command.add_flag("--audio,!--no-audio", audio_, "Whether it hears");
+    for (const auto& [name, number] : kProfiles) {
+        ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
+        const std::string prefix = number == 0 ? "--" : "--" + name + "-";
+        const std::string of = " of the profile " + name;
+        command.add_option(prefix + "source", profile.source,
+                           "Address" + of + ": rtsp://, http://, https://, file: or test:" +
+                               (number == 0 ? "" : "; empty takes the profile away"));
+        command.add_option(prefix + "size", profile.size, "Picture size" + of + ", such as 1280x720");
+        command.add_option(prefix + "fps", profile.fps, "Frames per second" + of);
+    }
+}
+
+void CameraOptions::ApplyTo(Camera& camera) const {
+    AssignIfGiven(camera.name, name_);
+    AssignIfGiven(camera.video_type, type_);
+    AssignIfGiven(camera.live_profile, live_profile_);
+    AssignIfGiven(camera.enabled, enabled_);
+    AssignIfGiven(camera.ptz, ptz_);
+    AssignIfGiven(camera.audio, audio_);
+    for (int number = 0; number < store::kProfileCount; ++number) {
+        const ProfileOptions& given = profiles_[static_cast<std::size_t>(number)];
+        if (given.source && given.source->empty()) {
+            std::erase_if(camera.profiles, [number](const CameraProfile& profile) { return profile.number == number; });
+            continue;
+        }
+        if (!given.source && !given.size && !given.fps) {
+            continue;
+        }
+        if (!given.source && camera.FindProfile(number) == nullptr) {
+            throw Failure(kUsage, "a profile needs a source before it has a size or a rate");
+        }
+        CameraProfile& profile = ProfileOf(camera, number);
+        AssignIfGiven(profile.source, given.source);
+        AssignIfGiven(profile.fps, given.fps);
+        if (given.size) {
+            ParseSize(*given.size, profile);
+        }
+    }
+}
+
+const char* VideoTypeName(VideoType type) {
+    return type == VideoType::kMjpeg ? "MJPEG" : type == VideoType::kH264 ? "H.264" : "H.265";
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,47 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The options that describe a camera, and how they change a record.
+#pragma once
+
+#include <array>
+#include <optional>
+#include <string>
+
+#include <CLI/CLI.hpp>
+
+#include "standalone/store/cameras.h"
+
+namespace lookhaven::cli {
+
+// What was given on the command line; what was not stays as it is.
+class CameraOptions {
+  public:
+    // This object must outlive the command.
+    void AddTo(CLI::App& command);
+
+    // Throws Failure when a profile that has no source was given a size or rate.
+    void ApplyTo(store::Camera& camera) const;
+
+    bool HasType() const { return type_.has_value(); }
+    bool HasAudio() const { return audio_.has_value(); }
+
+  private:
+    struct ProfileOptions {
+        std::optional<std::string> source;
+        std::optional<std::string> size;
+        std::optional<int> fps;
+    };
+
+    std::optional<std::string> name_;
+    std::optional<store::VideoType> type_;
+    std::optional<int> live_profile_;
+    std::optional<bool> enabled_;
+    std::optional<bool> ptz_;
+    std::optional<bool> audio_;
+    std::array<ProfileOptions, store::kProfileCount> profiles_;
+};
+
+// "H.264" and so on.
+const char* VideoTypeName(store::VideoType type);
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,181 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// lookhaven doctor: looks at every part of a running installation and says what to do.
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+
+#include "standalone/base/file_descriptor.h"
+#include "standalone/cli/commands.h"
+#include "standalone/ring/common_config.h"
+#include "standalone/ring/inventory.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+struct Finding {
+    std::string problem;
+    std::string remedy;
+};
+using Findings = std::vector<Finding>;
+
+constexpr int kSocketLimitMs = 3000;
+
+// Secrets lie in the state folder: cameras' passwords, the TLS key.
+Findings CheckFolder(const base::Installation& installation) {
+    Findings findings;
+    for (const std::string& name :
+         {std::string(), std::string("tls"), std::string("lookhaven.db"), std::string("store")}) {
+        const std::filesystem::path path = name.empty() ? installation.Home() : installation.Home() / name;
+        struct stat status {};
+        if (::stat(path.c_str(), &status) != 0) {
+            continue;
+        }
+        if ((status.st_mode & (S_IRWXG | S_IRWXO)) != 0) {
+            findings.push_back({path.string() + " is open to other users", "chmod go= " + path.string()});
+        }
+        if (status.st_uid != ::geteuid()) {
+            findings.push_back(
+                {path.string() + " belongs to another user", "run this as the user who runs the server"});
+        }
+    }
+    return findings;
+}
+
+Findings CheckStore(const base::Installation& installation) {
+    Findings findings;
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        for (const std::string& sentence : store.Check()) {
+            const std::size_t colon = sentence.find(": ");
+            findings.push_back({sentence.substr(0, colon), colon == std::string::npos
+                                                               ? "restore the store from a backup"
+                                                               : sentence.substr(colon + 2)});
+        }
+        const std::vector<store::User> users = store::Users(store).List();
+        if (std::none_of(users.begin(), users.end(), [](const store::User& user) { return user.IsManager(); })) {
+            findings.push_back({"no account may manage this installation", "lookhaven init --admin NAME"});
+        }
+    } catch (const store::SchemaError& error) {
+        findings.push_back({error.what(), "lookhaven init"});
+    } catch (const store::StoreError& error) {
+        findings.push_back({error.what(), "see that the file or the database server is there and may be used by you"});
+    }
+    return findings;
+}
+
+// An answer of any kind shows that the host accepts, forks and answers.
+bool HostAnswers(const std::string& path) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    const base::FileDescriptor socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    if (!socket || path.size() >= sizeof address.sun_path) {
+        return false;
+    }
+    std::memcpy(address.sun_path, path.data(), path.size());
+    if (::connect(socket.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        return false;
+    }
+    std::string head;
+    for (const char* part : {"CONTENT_LENGTH", "0", "SCGI", "1", "REQUEST_METHOD", "GET", "REQUEST_URI", "/webapi",
+                             "QUERY_STRING", "api=VEXO.Auth&version=1&method=Status"}) {
+        head.append(part).push_back('\0');
+    }
+    const std::string request = std::to_string(head.size()) + ":" + head + ",";
+    if (::send(socket.Get(), request.data(), request.size(), MSG_NOSIGNAL) != static_cast<ssize_t>(request.size())) {
+        return false;
+    }
+    pollfd wait{socket.Get(), POLLIN, 0};
+    char byte = 0;
+    return ::poll(&wait, 1, kSocketLimitMs) == 1 && ::recv(socket.Get(), &byte, 1, 0) == 1;
+}
+
+Findings CheckHost(const base::Installation& installation) {
+    const std::string socket = installation.WebApiSocket().string();
+    if (HostAnswers(socket)) {
+        return {};
+    }
+    return {{"the web API host does not answer at " + socket,
+             "start the server with script/server, or read " + installation.LogFolder().string()}};
+}
+
+Findings CheckRecorder(const base::Installation& installation) {
+    ring::CommonConfig* config = ring::MapCommonConfig(installation);
+    if (config != nullptr && ring::IsRecorderAlive(*config)) {
+        return {};
+    }
+    return {{config == nullptr ? "the recorder has not run since the machine started" : "the recorder does not run",
+             "start the server with script/server, or read " + installation.LogFolder().string()}};
+}
+
+Findings CheckSegments(const base::Installation& installation) {
+    Findings findings;
+    for (const ring::SegmentState& segment : ring::ListSegments(installation)) {
+        const std::string name =
+            "the shared memory " + std::to_string(segment.shm_id) + " of camera " + std::to_string(segment.id.camera);
+        if (!segment.has_known_layout) {
+            findings.push_back({name + " was made by another version",
+                                "restart the server; if it stays: ipcrm -m " + std::to_string(segment.shm_id)});
+        } else if (!segment.writer_alive && segment.attached == 0) {
+            findings.push_back({name + " was left behind", "start the recorder, which takes it up or removes it"});
+        }
+    }
+    return findings;
+}
+
+struct Check {
+    const char* name;
+    Findings (*run)(const base::Installation&);
+};
+constexpr Check kChecks[] = {{"folder", CheckFolder},
+                             {"store", CheckStore},
+                             {"host", CheckHost},
+                             {"recorder", CheckRecorder},
+                             {"segments", CheckSegments}};
+
+void Examine(const Console& console) {
+    const base::Installation installation = console.Installation();
+    Json::Value data = Json::arrayValue;
+    std::string text;
+    std::size_t count = 0;
+    for (const Check& check : kChecks) {
+        const Findings findings = check.run(installation);
+        Json::Value entry;
+        entry["check"] = check.name;
+        entry["ok"] = findings.empty();
+        entry["findings"] = Json::arrayValue;
+        text += std::string(findings.empty() ? "ok       " : "problem  ") + check.name + "\n";
+        for (const Finding& finding : findings) {
+            Json::Value item;
+            item["problem"] = finding.problem;
+            item["remedy"] = finding.remedy;
+            entry["findings"].append(item);
+            text += "         " + finding.problem + "\n         do: " + finding.remedy + "\n";
+        }
+        data.append(entry);
+        count += findings.size();
+    }
+    console.Answer(text, data);
+    if (count > 0) {
+        throw Failure(kFindings,
+                      count == 1 ? "there is one problem" : "there are " + std::to_string(count) + " problems");
+    }
+}
+
+}  // namespace
+
+void AddDoctor(CLI::App& program, Console& console) {
+    program.add_subcommand("doctor", "Examines the installation and says what to do")->callback([&console] {
+        Examine(console);
+    });
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,154 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// lookhaven user: accounts and what is denied to them.
+#include <algorithm>
+#include <map>
+#include <memory>
+
+#include "standalone/cli/commands.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+using store::CameraAccess;
+using store::Privilege;
+using store::User;
+using store::Users;
+
+const std::map<std::string, Privilege> kPrivileges = {
+    {"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}};
+const std::map<std::string, CameraAccess> kAccess = {
+    {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
+
+struct Request {
+    std::string name;
+    Privilege privilege = Privilege::kViewer;
+    int camera = 0;
+    std::vector<CameraAccess> kinds;
+};
+
+std::string PrivilegeName(Privilege privilege) {
+    return std::find_if(kPrivileges.begin(), kPrivileges.end(),
+                        [privilege](const auto& entry) { return entry.second == privilege; })
+        ->first;
+}
+
+User Require(Users& users, const std::string& name) {
+    const std::optional<User> user = users.FindByName(name);
+    if (!user) {
+        throw Failure(kNoInput, "there is no such account: lookhaven user list names them");
+    }
+    return *user;
+}
+
+Json::Value ToData(const User& user) {
+    Json::Value data;
+    data["id"] = user.id;
+    data["name"] = user.name;
+    data["privilege"] = static_cast<int>(user.privilege);
+    return data;
+}
+
+void Add(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const User user = Users(store).Add(request.name, ReadPassword(request.name, true), request.privilege);
+    console.Answer("The account " + user.name + " may log in as " + PrivilegeName(user.privilege) + ".", ToData(user));
+}
+
+void List(const Console& console) {
+    store::Store store = console.OpenStore();
+    Users users(store);
+    Json::Value data = Json::arrayValue;
+    Rows rows = {{"id", "name", "privilege", "denied cameras"}};
+    for (const User& user : users.List()) {
+        Json::Value entry = ToData(user);
+        std::string denied;
+        for (const auto& [name, kind] : kAccess) {
+            entry["denied"][name] = Json::arrayValue;
+            std::string ids;
+            for (const int camera : users.DeniedCameras(user.id, kind)) {
+                entry["denied"][name].append(camera);
+                ids += " " + std::to_string(camera);
+            }
+            denied += ids.empty() ? "" : (denied.empty() ? "" : "; ") + name + ids;
+        }
+        data.append(entry);
+        rows.push_back({std::to_string(user.id), user.name, PrivilegeName(user.privilege), denied});
+    }
+    console.Answer(Table(rows), data);
+}
+
+void SetPassword(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    Users users(store);
+    const User user = Require(users, request.name);
+    users.SetPassword(user.id, ReadPassword(user.name, true));
+    console.Answer("The account " + user.name + " has a new password and is logged out everywhere.", ToData(user));
+}
+
+void Remove(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    Users users(store);
+    const User user = Require(users, request.name);
+    const std::vector<User> all = users.List();
+    const auto owners =
+        std::count_if(all.begin(), all.end(), [](const User& other) { return other.privilege == Privilege::kOwner; });
+    if (user.privilege == Privilege::kOwner && owners == 1) {
+        throw Failure(kDataError, user.name + " is the only owner: make another one first");
+    }
+    users.Remove(user.id);
+    console.Answer("The account " + user.name + " is gone.", ToData(user));
+}
+
+void Permit(const Console& console, const Request& request, bool allow) {
+    store::Store store = console.OpenStore();
+    Users users(store);
+    const User user = Require(users, request.name);
+    if (!allow && !store::Cameras(store).Find(request.camera)) {
+        throw Failure(kNoInput,
+                      "there is no camera " + std::to_string(request.camera) + ": lookhaven camera list names them");
+    }
+    const std::vector<CameraAccess> kinds = request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds;
+    for (const CameraAccess kind : kinds) {
+        if (allow) {
+            users.Allow(user.id, request.camera, {kind});
+        } else {
+            users.Deny(user.id, request.camera, {kind});
+        }
+    }
+    console.Answer("The camera " + std::to_string(request.camera) + (allow ? " is allowed to " : " is denied to ") +
+                       user.name + ".",
+                   ToData(user));
+}
+
+}  // namespace
+
+void AddUser(CLI::App& program, Console& console) {
+    CLI::App* group = program.add_subcommand("user", "Accounts and their rights")->require_subcommand(1);
+    auto request = std::make_shared<Request>();
+    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
+        CLI::App* added = group->add_subcommand(name, purpose);
+        added->add_option("name", request->name, "The account")->required();
+        added->callback([&console, request, run] { run(console, *request); });
+        return added;
+    };
+    command("add", "Makes an account; its password is asked for", Add)
+        ->add_option("--privilege", request->privilege, "owner, manager or viewer (the default)")
+        ->transform(CLI::CheckedTransformer(kPrivileges));
+    group->add_subcommand("list", "Lists the accounts")->callback([&console] { List(console); });
+    command("passwd", "Changes a password and ends the account's sessions", SetPassword);
+    command("remove", "Removes an account and ends its sessions", Remove);
+    for (CLI::App* permit :
+         {command("deny", "Denies a camera and ends the account's sessions",
+                  [](const Console&c, const Request&r) { Permit(c, r, false); }),
+          command("allow", "Allows a camera again", [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
+        permit->add_option("camera", request->camera, "The camera's id")->required();
+        permit->add_option("--kind", request->kinds, "live, playback or audio; may be repeated (else all three)")
+            ->transform(CLI::CheckedTransformer(kAccess));
+    }
+}
+
+}  // namespace lookhaven::cli
