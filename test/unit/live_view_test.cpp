@@ -12,13 +12,14 @@
 #include "player/liveview_src/liveview_src.h"
 #include "test/support/platform/scripted_platform.h"
 
+using lookhaven::test::Calls;
 using lookhaven::test::MakeCamera;
+using lookhaven::test::operator+;
 using lookhaven::test::ScriptedFrame;
 using lookhaven::test::ScriptedPlatform;
 using lookhaven::test::StdoutCapture;
 using testing::ElementsAre;
 using testing::IsEmpty;
-using Calls = std::vector<std::string>;
 using Script = std::function<void(ScriptedPlatform&)>;
 
 namespace {
@@ -27,11 +28,6 @@ struct ProbeHandler : LiveviewSrcHandler {
     explicit ProbeHandler(ScriptedPlatform& platform) : LiveviewSrcHandler(platform.Request(), platform.Response()) {}
     using LHWebAPIHandler::m_ErrCode;
 };
-
-Calls operator+(Calls left, const Calls& right) {
-    left.insert(left.end(), right.begin(), right.end());
-    return left;
-}
 
 // A "Play" request of an admitted caller for camera 5, which streams MJPEG.
 struct LiveView {
@@ -55,6 +51,7 @@ const Calls kCamera = kItem + Calls{"GetParam(isFromPlugin,0)", "GetParam(profil
 const Calls kStream = {"StartLive(5,51)", "LiveStreamFifoAt(5,51)"};
 // A pass that finds no picture and ends the output, and the way out of the loop.
 const Calls kLastPass = {"UpdateStamp()", "ReadLatest(10001)", "ReadFinish(null,1,position)", "usleep(10000)"};
+const Calls kStart = {"StartRead()"};
 const Calls kClose = {"StopRead()", "shmdt()", "SetEnableOutput(0)"};
 
 struct RequestRow {
@@ -89,7 +86,7 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
              Calls{"log Cam[5]: Failed to attach live stream [51].\n"}},
         {"signals that cannot be caught",
          [](auto& p) {
-             p.params["itemType"] = 2, p.failing_signals = {SIGINT, SIGPIPE};
+             p.params["itemType"] = 2, p.failing_signals.insert({SIGINT, SIGPIPE});
          },
          0,
          kDispatch + Calls{kSignals[0], "log Fail to set sigaction [SIGINT].\n", kSignals[1], kSignals[2], kSignals[3],
@@ -98,7 +95,7 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
          own_profile + kStream + Calls{"StartRead()", "Write(image/jpeg,null,0,null)", "fflush()"} + kLastPass +
              kClose},
         {"isFromPlugin 2", [](auto& p) { p.params["isFromPlugin"] = 2; }, 0,
-         own_profile + kStream + Calls{"StartRead()"} + kLastPass + kClose},
+         own_profile + kStream + kStart + kLastPass + kClose},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
@@ -123,130 +120,86 @@ TEST(LiveViewRequest, SignalsSetTheStopFlag) {
 
 struct LoopRow {
     const char* name;
-    Script script;
+    Script before;
+    const char* at;  // the call at which then happens, each time
+    Script then;
     Calls calls;  // from StartRead on
 };
 
-Script OnCall(const char* call, const Script& change) {
-    return [=](ScriptedPlatform& p) {
-        p.on_call = [=, &p](const std::string& made) {
-            if (made == call) {
-                change(p);
-            }
-        };
-    };
+Calls Read(int last_seq) {
+    return {"UpdateStamp()", "ReadLatest(" + std::to_string(last_seq) + ")"};
 }
-
-const Calls kStart = {"StartRead()"};
-const Calls kNothing = {"ReadFinish(null,1,position)", "usleep(10000)"};
-
-Calls Sent(int last_seq, const std::string& data) {
-    return {"UpdateStamp()",
-            "ReadLatest(" + std::to_string(last_seq) + ")",
-            "Write(image/jpeg," + data + "," + std::to_string(data.size()) + ",null)",
-            "fflush()",
-            "ReadFinish(entry,1,position)",
-            "usleep(10000)"};
+Calls Write(const std::string& data) {
+    return {"Write(image/jpeg," + data + "," + std::to_string(data.size()) + ",null)", "fflush()"};
 }
+const Calls kDone = {"ReadFinish(entry,1,position)", "usleep(10000)"};
 Calls Empty(int last_seq) {
-    return Calls{"UpdateStamp()", "ReadLatest(" + std::to_string(last_seq) + ")"} + kNothing;
+    return Read(last_seq) + Calls{"ReadFinish(null,1,position)", "usleep(10000)"};
 }
-Calls Exit(int eof, int error, int stop) {
-    return Calls{"log Exit loop [Cam: 5, feof: " + std::to_string(eof) + ", ferror: " + std::to_string(error) +
-                 ", gblStop: " + std::to_string(stop) + "]\n"} +
-           kClose;
+Calls TimeOut(int last_seq) {
+    return Read(last_seq) + Calls{"ReadFinish(null,1,position)", "log Timeeout [Cam: 5]\n"};
+}
+Calls Exit(const std::string& eof, const std::string& error, const std::string& stop) {
+    return Calls{"log Exit loop [Cam: 5, feof: " + eof + ", ferror: " + error + ", gblStop: " + stop + "]\n"} + kClose;
 }
 Calls Sleeps(std::size_t count) {
     return Calls(count, "sleep(10)");
 }
 
-void Slowly(ScriptedPlatform& p, int seconds) {
-    p.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = 5;
+void Leave(ScriptedPlatform&) {}
+void Stop(ScriptedPlatform&) {
+    gblStop = 1;
+}
+void Pause(ScriptedPlatform& p) {
+    p.common_cfg.m_blPause = 1;
+}
+void LoseService(ScriptedPlatform& p) {
+    p.has_common_cfg = false;
+}
+void NoPictures(ScriptedPlatform& p) {
     p.frames.resize(9);
-    OnCall("usleep(10000)", [seconds](auto& script) { script.now += seconds; })(p);
 }
 
 const LoopRow kLoop[] = {
     {"newest picture behind its offset, then nothing newer",
      [](auto& p) {
-         p.frames = {ScriptedFrame{7, "xxAB", 2}, {}, ScriptedFrame{0, "C"}};
+         p.frames = {{{7, "xxAB", 2}}, {}, {{0, "C"}}};
      },
-     Sent(10001, "AB") + Empty(7) + Sent(7, "C") + Empty(0) + Exit(1, 0, 0)},
-    {"stop flag", [](auto&) { gblStop = 1; }, Exit(0, 0, 1)},
-    {"broken output", [](auto& p) { p.is_error = true; }, Exit(0, 1, 0)},
+     "", Leave,
+     Read(10001) + Write("AB") + kDone + Empty(7) + Read(7) + Write("C") + kDone + Empty(0) + Exit("1", "0", "0")},
+    {"stopped", Stop, "", Leave, Exit("0", "0", "1")},
+    {"broken output", [](auto& p) { p.is_error = true; }, "", Leave, Exit("0", "1", "0")},
     {"stopped while sending",
      [](auto& p) {
-         p.frames = {ScriptedFrame{1, "A"}, ScriptedFrame{2, "B"}};
-         OnCall("fflush()", [](auto&) { gblStop = 1; })(p);
+         p.frames = {{{1, "A"}}, {{2, "B"}}};
      },
-     Sent(10001, "A") + Exit(0, 0, 1)},
-    {"paused, then on",
-     [](auto& p) {
-         p.common_cfg.m_blPause = 1;
-         OnCall("sleep(10)", [](auto& s) { s.common_cfg.m_blPause = 0; })(p);
-     },
-     Sleeps(1) + Empty(10001) + Exit(1, 0, 0)},
-    {"no configuration, then on",
-     [](auto& p) {
-         p.has_common_cfg = false;
-         OnCall("sleep(10)", [](auto& s) { s.has_common_cfg = s.now >= 1000020; })(p);
-     },
-     Sleeps(2) + Empty(10001) + Exit(1, 0, 0)},
-    {"client gone while paused",
-     [](auto& p) {
-         p.common_cfg.m_blPause = 1;
-         OnCall("sleep(10)", [](auto& s) { s.is_eof = true; })(p);
-     },
-     Sleeps(1) + Exit(1, 0, 0)},
-    {"output broken while paused",
-     [](auto& p) {
-         p.has_common_cfg = false;
-         OnCall("sleep(10)", [](auto& s) { s.is_error = true; })(p);
-     },
-     Sleeps(1) + Exit(0, 1, 0)},
-    {"stopped while paused",
-     [](auto& p) {
-         p.has_common_cfg = false;
-         OnCall("sleep(10)", [](auto&) { gblStop = 1; })(p);
-     },
-     Sleeps(1) + Exit(0, 0, 1)},
-    {"a day old", [](auto& p) { p.common_cfg.m_Timestamp -= 86400; }, Empty(10001) + Exit(1, 0, 0)},
-    {"older, until refreshed",
-     [](auto& p) {
-         p.common_cfg.m_Timestamp -= 86401;
-         OnCall("sleep(10)", [](auto& s) { s.common_cfg.m_Timestamp = s.now; })(p);
-     },
-     Sleeps(1) + Empty(10001) + Exit(1, 0, 0)},
-    {"a day ahead, after ten seconds", [](auto& p) { p.common_cfg.m_Timestamp += 86401; },
-     Sleeps(1) + Empty(10001) + Exit(1, 0, 0)},
-    {"a timestamp of nonsense",
-     [](auto& p) {
-         p.common_cfg.m_Timestamp = INT64_MIN;
-         OnCall("sleep(10)", [](auto&) { gblStop = 1; })(p);
-     },
-     Sleeps(1) + Exit(0, 0, 1)},
-    {"time-out after a pause",
-     [](auto& p) {
-         p.common_cfg.m_blPause = 1;
-         OnCall("sleep(10)", [](auto& s) { s.common_cfg.m_blPause = s.now < 1000030; })(p);
-     },
-     Sleeps(3) + Calls{"UpdateStamp()", "ReadLatest(10001)", "ReadFinish(null,1,position)", "log Timeeout [Cam: 5]\n"} +
-         Exit(1, 0, 0)},
-    {"exactly twenty seconds are no time-out", [](auto& p) { Slowly(p, 20); },
-     Empty(10001) + Empty(10001) +
-         Calls{"UpdateStamp()", "ReadLatest(10001)", "ReadFinish(null,1,position)", "log Timeeout [Cam: 5]\n"} +
-         Exit(0, 0, 0)},
+     "fflush()", Stop, Read(10001) + Write("A") + kDone + Exit("0", "0", "1")},
+    {"paused, then on", Pause, "sleep(10)", [](auto& p) { p.common_cfg.m_blPause = 0; },
+     Sleeps(1) + Empty(10001) + Exit("1", "0", "0")},
+    {"no service, then on", LoseService, "sleep(10)", [](auto& p) { p.has_common_cfg = p.now >= 1000020; },
+     Sleeps(2) + Empty(10001) + Exit("1", "0", "0")},
+    {"client gone while paused", Pause, "sleep(10)", [](auto& p) { p.is_eof = true; }, Sleeps(1) + Exit("1", "0", "0")},
+    {"output broken while paused", LoseService, "sleep(10)", [](auto& p) { p.is_error = true; },
+     Sleeps(1) + Exit("0", "1", "0")},
+    {"stopped while paused", LoseService, "sleep(10)", Stop, Sleeps(1) + Exit("0", "0", "1")},
+    {"a day old", [](auto& p) { p.common_cfg.m_Timestamp -= 86400; }, "", Leave, Empty(10001) + Exit("1", "0", "0")},
+    {"older, until refreshed", [](auto& p) { p.common_cfg.m_Timestamp -= 86401; }, "sleep(10)",
+     [](auto& p) { p.common_cfg.m_Timestamp = p.now; }, Sleeps(1) + Empty(10001) + Exit("1", "0", "0")},
+    {"a day ahead in ten seconds", [](auto& p) { p.common_cfg.m_Timestamp += 86401; }, "", Leave,
+     Sleeps(1) + Empty(10001) + Exit("1", "0", "0")},
+    {"nonsense for a time", [](auto& p) { p.common_cfg.m_Timestamp = INT64_MIN; }, "sleep(10)", Stop,
+     Sleeps(1) + Exit("0", "0", "1")},
+    {"time-out after a pause", Pause, "sleep(10)", [](auto& p) { p.common_cfg.m_blPause = p.now < 1000030; },
+     Sleeps(3) + TimeOut(10001) + Exit("1", "0", "0")},
+    {"exactly twenty seconds are no time-out", NoPictures, "usleep(10000)", [](auto& p) { p.now += 20; },
+     Empty(10001) + Empty(10001) + TimeOut(10001) + Exit("0", "0", "0")},
     {"a failing flush still counts as a write",
      [](auto& p) {
-         Slowly(p, 15);
-         p.frames[1] = ScriptedFrame{3, "A"};
-         p.flush_fails = true;
+         NoPictures(p), p.frames[1] = {3, "A"}, p.flush_fails = true;
      },
-     Empty(10001) +
-         Calls{"UpdateStamp()", "ReadLatest(10001)", "Write(image/jpeg,A,1,null)", "fflush()",
-               "log Failed to fflush data [Cam: 5, errno: 32]\n", "ReadFinish(entry,1,position)", "usleep(10000)"} +
-         Empty(3) + Calls{"UpdateStamp()", "ReadLatest(3)", "ReadFinish(null,1,position)", "log Timeeout [Cam: 5]\n"} +
-         Exit(0, 0, 0)},
+     "usleep(10000)", [](auto& p) { p.now += 15; },
+     Empty(10001) + Read(10001) + Write("A") + Calls{"log Failed to fflush data [Cam: 5, errno: 32]\n"} + kDone +
+         Empty(3) + TimeOut(3) + Exit("0", "0", "0")},
 };
 
 TEST(LiveViewLoop, RunsAndEndsInOrder) {
@@ -254,7 +207,12 @@ TEST(LiveViewLoop, RunsAndEndsInOrder) {
         SCOPED_TRACE(row.name);
         LiveView test;
         test.platform.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = 5;
-        row.script(test.platform);
+        row.before(test.platform);
+        test.platform.on_call = [&](const std::string& call) {
+            if (call == row.at) {
+                row.then(test.platform);
+            }
+        };
         ProbeHandler(test.platform).LiveviewMjpgCam(5, 51, false);
         EXPECT_EQ(test.platform.CallsFrom("StartRead"), kStart + row.calls);
         for (const auto& log : test.platform.logs) {

@@ -13,9 +13,10 @@
 #include "webapi/include/lhwebapihandler.h"
 #include "webapi/lookhaven_player.h"
 
+using lookhaven::test::Calls;
+using lookhaven::test::operator+;
 using lookhaven::test::ScriptedPlatform;
 using testing::ElementsAre;
-using Calls = std::vector<std::string>;
 
 namespace {
 
@@ -29,11 +30,6 @@ struct ProbeHandler : LHHandlerBase<ProbeHandler> {
     using LHWebAPIHandler::m_Mutex;
     using LHWebAPIHandler::SetErrorCode;
 };
-
-Calls operator+(Calls left, const Calls& right) {
-    left.insert(left.end(), right.begin(), right.end());
-    return left;
-}
 
 const Calls kSession = {"IsAuthorized()", "HasAppPriv(VEXO.VDX.Lookhaven)", "IsAdmin()", "GetLoginUserName()"};
 const Calls kPeer = {"IsLHRunning()", "GetParam(isCrossSite,0)", "GetParam(client,\"\")"};

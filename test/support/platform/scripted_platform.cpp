@@ -38,6 +38,11 @@ ScriptedPlatform* current = nullptr;
 
 }  // namespace
 
+Calls operator+(Calls left, const Calls& right) {
+    left.insert(left.end(), right.begin(), right.end());
+    return left;
+}
+
 ScriptedPlatform* CurrentPlatform() {
     return current;
 }
@@ -84,7 +89,7 @@ VEXO::APIResponse* ScriptedPlatform::Response() {
     return &response;
 }
 
-std::vector<std::string> ScriptedPlatform::CallsFrom(const std::string& text) const {
+Calls ScriptedPlatform::CallsFrom(const std::string& text) const {
     auto first = calls.begin();
     while (first != calls.end() && first->rfind(text, 0) != 0) {
         ++first;

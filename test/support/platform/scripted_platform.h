@@ -25,6 +25,9 @@
 
 namespace lookhaven::test {
 
+using Calls = std::vector<std::string>;
+Calls operator+(Calls left, const Calls& right);
+
 struct LogLine {
     std::string categ, level, file;  // "null" for a null pointer
     int line;
@@ -54,9 +57,9 @@ class ScriptedPlatform {
     VEXO::APIRequest* Request();
     VEXO::APIResponse* Response();
     // The recorded calls from the first that begins with the text on.
-    std::vector<std::string> CallsFrom(const std::string& text) const;
+    Calls CallsFrom(const std::string& text) const;
 
-    std::vector<std::string> calls;
+    Calls calls;
     std::vector<LogLine> logs;
     std::function<void(const std::string& call)> on_call;
 
