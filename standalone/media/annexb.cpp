@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/media/annexb.h"
 
+#include <algorithm>
 #include <array>
 
 namespace lookhaven::media {
@@ -19,25 +20,58 @@ std::size_t AfterStartCode(std::span<const std::uint8_t> frame, std::size_t from
     return frame.size();
 }
 
-enum class Unit { kSequenceSet, kPictureSet, kOtherSet, kPicture, kOther };
+enum class Unit { kSequenceSet, kPictureSet, kOtherSet, kKeyPicture, kPicture, kOther };
 
 Unit UnitAt(Codec codec, std::uint8_t head) {
     if (codec == Codec::kH264) {
-        const int type = head & 0x1f;
-        return type == 7                ? Unit::kSequenceSet
-               : type == 8              ? Unit::kPictureSet
-               : type >= 1 && type <= 5 ? Unit::kPicture
-                                        : Unit::kOther;
+        switch (const int type = head & 0x1f) {
+        case 7:
+            return Unit::kSequenceSet;
+        case 8:
+            return Unit::kPictureSet;
+        case 5:
+            return Unit::kKeyPicture;
+        default:
+            return type >= 1 && type < 5 ? Unit::kPicture : Unit::kOther;
+        }
     }
-    const int type = (head >> 1) & 0x3f;
-    return type == 33   ? Unit::kSequenceSet
-           : type == 34 ? Unit::kPictureSet
-           : type == 32 ? Unit::kOtherSet
-           : type < 32  ? Unit::kPicture
-                        : Unit::kOther;
+    switch (const int type = (head >> 1) & 0x3f) {
+    case 33:
+        return Unit::kSequenceSet;
+    case 34:
+        return Unit::kPictureSet;
+    case 32:
+        return Unit::kOtherSet;
+    default:
+        return type >= 16 && type < 24 ? Unit::kKeyPicture : type < 32 ? Unit::kPicture : Unit::kOther;
+    }
+}
+
+bool IsPicture(Unit unit) {
+    return unit == Unit::kPicture || unit == Unit::kKeyPicture;
 }
 
 }  // namespace
+
+bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame) {
+    for (std::size_t at = AfterStartCode(frame, 0); at < frame.size(); at = AfterStartCode(frame, at)) {
+        if (const Unit unit = UnitAt(codec, frame[at]); IsPicture(unit)) {
+            return unit == Unit::kKeyPicture;
+        }
+    }
+    return false;
+}
+
+bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece) {
+    const std::size_t at = AfterStartCode(piece, 0);
+    const std::size_t head_bytes = codec == Codec::kH264 ? 1 : 2;
+    // A later fragment of a unit has no start code in front; one by chance deeper inside means nothing.
+    if (at > kStartCode.size() || at + head_bytes >= piece.size()) {
+        return false;
+    }
+    // The first slice of a picture says so in its first bit.
+    return !IsPicture(UnitAt(codec, piece[at])) || (piece[at + head_bytes] & 0x80) != 0;
+}
 
 ParameterSets::ParameterSets(Codec codec, std::span<const std::uint8_t> initial)
     : codec_(codec),
@@ -60,7 +94,7 @@ std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> fr
     bool has_picture_set = false;
     for (std::size_t begin = AfterStartCode(frame, 0); begin < frame.size();) {
         const Unit unit = UnitAt(codec_, frame[begin]);
-        if (unit == Unit::kPicture) {
+        if (IsPicture(unit)) {
             break;
         }
         const std::size_t next = AfterStartCode(frame, begin);
@@ -69,9 +103,11 @@ std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> fr
             while (end > begin && frame[end - 1] == 0) {
                 --end;  // a longer start code's zeros belong to nobody
             }
-            sets.insert(sets.end(), kStartCode.begin(), kStartCode.end());
-            sets.insert(sets.end(), frame.begin() + static_cast<std::ptrdiff_t>(begin),
-                        frame.begin() + static_cast<std::ptrdiff_t>(end));
+            const auto set = frame.subspan(begin, end - begin);
+            if (std::search(sets.begin(), sets.end(), set.begin(), set.end()) == sets.end()) {
+                sets.insert(sets.end(), kStartCode.begin(), kStartCode.end());
+                sets.insert(sets.end(), set.begin(), set.end());
+            }
             has_sequence_set |= unit == Unit::kSequenceSet;
             has_picture_set |= unit == Unit::kPictureSet;
         }

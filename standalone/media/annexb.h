@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps parameter sets in front of the key frames of an Annex B stream.
+// Tells the units of an Annex B stream apart, and keeps parameter sets in front of its key frames.
 //
 // Why so        A viewer starts at any key frame, but many cameras send their parameter sets once, or only in their
 //               description of the session.
@@ -13,6 +13,12 @@
 #include "standalone/media/packet.h"
 
 namespace lookhaven::media {
+
+// The frame holds a picture that needs no other.
+bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame);
+
+// The piece of a stream begins with what may stand at the beginning of a picture: its first slice, or what precedes it.
+bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece);
 
 class ParameterSets {
   public:

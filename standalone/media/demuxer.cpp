@@ -43,13 +43,18 @@ std::span<const std::uint8_t> ExtraData(const AVCodecParameters& parameters) {
     return {parameters.extradata, static_cast<std::size_t>(parameters.extradata_size)};
 }
 
+std::span<const std::uint8_t> Bytes(const AVPacket& packet) {
+    return {packet.data, static_cast<std::size_t>(packet.size)};
+}
+
 }  // namespace
 
-Demuxer::Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, bool analyse)
+Demuxer::Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, Framing framing)
     : deadline_(deadline),
       input_(OwnAv(avformat_alloc_context())),
       packet_(OwnAv(av_packet_alloc())) {
     input_->interrupt_callback = deadline.Callback();
+    input_->flags |= framing == Framing::kPieces ? AVFMT_FLAG_NOPARSE : 0;
     AVFormatContext* input = input_.release();  // freed by libav when it cannot be opened
     const int opened = avformat_open_input(&input, url.c_str(), nullptr, options.Get());
     input_.reset(input);
@@ -57,14 +62,14 @@ Demuxer::Demuxer(const std::string& url, AvOptions& options, Deadline& deadline,
         deadline_.Check();
         CheckAv(opened, "cannot open");
     }
-    if (analyse) {
+    if (framing == Framing::kWhole) {
         CheckAv(avformat_find_stream_info(input_.get(), nullptr), "cannot analyse");
     }
-    ChooseVideo();
+    ChooseVideo(framing);
     ChooseAudio();
 }
 
-void Demuxer::ChooseVideo() {
+void Demuxer::ChooseVideo(Framing framing) {
     video_index_ = av_find_best_stream(input_.get(), AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
     if (video_index_ < 0) {
         throw SourceError("has no picture");
@@ -79,8 +84,13 @@ void Demuxer::ChooseVideo() {
     if (*codec == Codec::kMjpeg) {
         return;
     }
-    video_filter_ = OpenFilter(*codec == Codec::kH264 ? "h264_mp4toannexb" : "hevc_mp4toannexb", stream);
-    parameter_sets_.emplace(*codec, ExtraData(*video_filter_->par_out));
+    if (framing == Framing::kPieces) {
+        assembler_.emplace(*codec);
+        parameter_sets_.emplace(*codec, ExtraData(*stream.codecpar));
+    } else {
+        video_filter_ = OpenFilter(*codec == Codec::kH264 ? "h264_mp4toannexb" : "hevc_mp4toannexb", stream);
+        parameter_sets_.emplace(*codec, ExtraData(*video_filter_->par_out));
+    }
     parser_codec_ = OwnAv(avcodec_alloc_context3(nullptr));
     parser_codec_->codec_id = stream.codecpar->codec_id;
     parser_ = OwnAv(av_parser_init(stream.codecpar->codec_id));
@@ -126,37 +136,50 @@ std::optional<Packet> Demuxer::Take() {
     if (!is_video && packet_->stream_index != audio_index_) {
         return std::nullopt;
     }
-    const std::int64_t time = packet_->pts != AV_NOPTS_VALUE ? packet_->pts : packet_->dts;
-    if (time != AV_NOPTS_VALUE) {
-        last_time_us_ = av_rescale_q(time, input_->streams[packet_->stream_index]->time_base, AV_TIME_BASE_Q);
-    }
+    const std::int64_t time_us = TimeOfPacket();
     std::optional<Packet> packet;
     if (is_video) {
-        packet = TakeVideo();
+        packet = TakeVideo(time_us);
     } else if (video_.width > 0) {
-        packet = Packet{Medium::kAudio, {packet_->data, static_cast<std::size_t>(packet_->size)}, 0, true, &*audio_};
+        packet = Packet{Medium::kAudio, Bytes(*packet_), time_us, true, &*audio_};
     }
     if (!packet || packet->data.empty() || packet->data.size() > kMaxFrameBytes) {
         return std::nullopt;
     }
-    packet->timestamp_us = last_time_us_;
     if (is_video) {
         deadline_.Rearm();
     }
     return packet;
 }
 
-std::optional<Packet> Demuxer::TakeVideo() {
-    if (video_filter_ != nullptr) {
-        if (av_bsf_send_packet(video_filter_.get(), packet_.get()) < 0 ||
-            av_bsf_receive_packet(video_filter_.get(), packet_.get()) < 0) {
-            return std::nullopt;  // one broken frame
-        }
+// Bare streams of frames have no times: their frames follow each other at the rate that they name, or at 25 a second.
+std::int64_t Demuxer::TimeOfPacket() {
+    constexpr std::int64_t kUsualFrameUs = 40'000;
+    const AVRational unit = input_->streams[packet_->stream_index]->time_base;
+    const std::int64_t time = packet_->pts != AV_NOPTS_VALUE ? packet_->pts : packet_->dts;
+    const std::int64_t time_us = time != AV_NOPTS_VALUE ? av_rescale_q(time, unit, AV_TIME_BASE_Q) : next_time_us_;
+    const std::int64_t length_us = av_rescale_q(packet_->duration, unit, AV_TIME_BASE_Q);
+    next_time_us_ = time_us + (length_us > 0 ? length_us : kUsualFrameUs);
+    return time_us;
+}
+
+std::optional<Packet> Demuxer::TakeVideo(std::int64_t time_us) {
+    if (assembler_) {
+        const std::optional<FrameAssembler::Frame> frame = assembler_->Add(Bytes(*packet_), time_us);
+        return frame ? CompleteFrame(frame->data, frame->time_us) : std::nullopt;
     }
-    Packet packet{Medium::kVideo, {packet_->data, static_cast<std::size_t>(packet_->size)}, 0, true, &video_};
+    if (video_filter_ != nullptr && (av_bsf_send_packet(video_filter_.get(), packet_.get()) < 0 ||
+                                     av_bsf_receive_packet(video_filter_.get(), packet_.get()) < 0)) {
+        return std::nullopt;  // one broken frame
+    }
+    return CompleteFrame(Bytes(*packet_), time_us);
+}
+
+std::optional<Packet> Demuxer::CompleteFrame(std::span<const std::uint8_t> frame, std::int64_t time_us) {
+    Packet packet{Medium::kVideo, frame, time_us, true, &video_};
     if (parameter_sets_) {
-        packet.key_frame = (packet_->flags & AV_PKT_FLAG_KEY) != 0;
-        packet.data = packet.key_frame ? parameter_sets_->Complete(packet.data) : packet.data;
+        packet.key_frame = IsKeyFrame(video_.codec, frame);
+        packet.data = packet.key_frame ? parameter_sets_->Complete(frame) : frame;
     }
     if (packet.key_frame && !LearnFormat(packet.data)) {
         return std::nullopt;

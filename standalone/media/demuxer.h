@@ -8,6 +8,7 @@
 #include <string>
 
 #include "standalone/media/annexb.h"
+#include "standalone/media/frame_assembler.h"
 #include "standalone/media/libav.h"
 #include "standalone/media/packet.h"
 
@@ -15,9 +16,11 @@ namespace lookhaven::media {
 
 class Demuxer {
   public:
-    // The deadline must outlive the demuxer, which asks it in every wait. With analyse, reads ahead to learn what the
-    // container does not say. Throws SourceError.
-    Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, bool analyse);
+    // How frames come out of the input: whole, or in pieces with times.
+    enum class Framing { kWhole, kPieces };
+
+    // The deadline must outlive the demuxer, which asks it in every wait. Throws SourceError.
+    Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, Framing framing);
 
     const std::optional<StreamFormat>& Audio() const { return audio_; }
 
@@ -26,10 +29,12 @@ class Demuxer {
     std::optional<Packet> Read();
 
   private:
-    void ChooseVideo();
+    void ChooseVideo(Framing framing);
     void ChooseAudio();
     std::optional<Packet> Take();
-    std::optional<Packet> TakeVideo();
+    std::int64_t TimeOfPacket();
+    std::optional<Packet> TakeVideo(std::int64_t time_us);
+    std::optional<Packet> CompleteFrame(std::span<const std::uint8_t> frame, std::int64_t time_us);
     bool LearnFormat(std::span<const std::uint8_t> frame);
 
     Deadline& deadline_;
@@ -37,13 +42,14 @@ class Demuxer {
     AvPtr<AVPacket> packet_;
     int video_index_ = -1;
     int audio_index_ = -1;
-    AvPtr<AVBSFContext> video_filter_;
+    AvPtr<AVBSFContext> video_filter_;         // of H.264 and H.265 that comes whole
+    std::optional<FrameAssembler> assembler_;  // of H.264 and H.265 that comes in pieces
     AvPtr<AVCodecContext> parser_codec_;
     AvPtr<AVCodecParserContext> parser_;
     std::optional<ParameterSets> parameter_sets_;
     StreamFormat video_;
     std::optional<StreamFormat> audio_;
-    std::int64_t last_time_us_ = 0;
+    std::int64_t next_time_us_ = 0;  // of a packet without a time
 };
 
 }  // namespace lookhaven::media

@@ -56,7 +56,7 @@ class FileLoop : public Source {
         AvOptions options;
         options.Set("protocol_whitelist", "file")
             .Set("format_whitelist", "matroska,mov,avi,mpegts,h264,hevc,mjpeg,flv");
-        demuxer_.emplace("file:" + path_, options, deadline_, true);
+        demuxer_.emplace("file:" + path_, options, deadline_, Demuxer::Framing::kWhole);
     }
 
     std::string path_;

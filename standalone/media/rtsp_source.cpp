@@ -21,7 +21,8 @@ class RtspSource : public Source {
   public:
     RtspSource(const std::string& url, const SourceOptions& options, std::stop_token stop)
         : deadline_(std::move(stop), options.no_data_limit),
-          demuxer_(WithCredentials(url, options.credentials), SetRtspOptions(av_options_), deadline_, false) {}
+          demuxer_(WithCredentials(url, options.credentials), SetRtspOptions(av_options_), deadline_,
+                   Demuxer::Framing::kPieces) {}
 
     const std::optional<StreamFormat>& Audio() const override { return demuxer_.Audio(); }
 

@@ -27,6 +27,7 @@ Supervisor::Supervisor(const base::Installation& installation, std::chrono::mill
       common_config_(installation),
       catalog_(installation.StoreUrl()) {
     DoEverySecond();
+    Reconcile();  // wishes may be older than this recorder
 }
 
 void Supervisor::Step() {

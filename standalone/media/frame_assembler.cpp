@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/frame_assembler.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "standalone/media/annexb.h"
+
+namespace lookhaven::media {
+
+std::optional<FrameAssembler::Frame> FrameAssembler::Add(std::span<const std::uint8_t> piece, std::int64_t time_us) {
+    std::optional<Frame> frame;
+    if (time_us != pending_time_us_ && MayBeginPicture(codec_, piece)) {
+        whole_ = std::exchange(pending_, {});
+        if (!whole_.empty() && whole_.size() <= kMaxFrameBytes) {
+            frame = Frame{whole_, pending_time_us_};
+        }
+        pending_time_us_ = time_us;
+    }
+    // One byte too many is remembered, and no more.
+    const std::size_t room = kMaxFrameBytes + 1 - pending_.size();
+    const auto taken = piece.first(std::min(room, piece.size()));
+    pending_.insert(pending_.end(), taken.begin(), taken.end());
+    return frame;
+}
+
+}  // namespace lookhaven::media

@@ -1,0 +1,103 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A recorder process with a state folder of its own, and viewers of what it records.
+#pragma once
+
+#include <chrono>
+#include <filesystem>
+#include <functional>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "standalone/base/installation.h"
+#include "standalone/media/packet.h"
+#include "standalone/ring/demand.h"
+#include "standalone/ring/reader.h"
+#include "standalone/store/cameras.h"
+
+namespace lookhaven::test {
+
+// Asks the condition until it holds or the time is over; true when it held.
+bool Eventually(const std::function<bool()>& condition, std::chrono::milliseconds limit = std::chrono::seconds(10));
+
+// A program that dies with the test.
+class Child {
+  public:
+    // Its standard output and error go to the file.
+    Child(const std::vector<std::string>& command, const std::filesystem::path& output);
+    Child(Child&& other) noexcept : pid_(std::exchange(other.pid_, -1)) {}
+    ~Child();
+
+    void Signal(int signal) const;
+    // Its wait status once it has ended, or nothing when the time was over first.
+    std::optional<int> Wait(std::chrono::milliseconds limit = std::chrono::seconds(10));
+    // How many descriptors ("fd") or threads ("task") it has.
+    std::size_t Count(const char* kind) const;
+
+  private:
+    pid_t pid_;
+};
+
+// A copy of one entry of a ring.
+struct Seen {
+    std::string data;
+    bool key_frame = false;
+    std::int64_t timestamp_us = 0;
+};
+
+// Watches one stream, and wants it for as long as it is asked for frames.
+class Viewer {
+  public:
+    Viewer(const base::Installation& installation, int camera, ring::Medium medium = ring::Medium::kVideo);
+    Viewer(const Viewer&) = delete;
+    Viewer& operator=(const Viewer&) = delete;
+    ~Viewer() { Leave(); }
+
+    // The next entry of the run, attaching anew when the ring was retired. Fails the test when none comes in time.
+    Seen Next(std::chrono::milliseconds limit = std::chrono::seconds(20));
+    std::vector<Seen> Take(std::size_t count);
+    // Frames can be found in the ring it is attached to.
+    bool HasPicture();
+    // Attached to a ring that its writer goes on with.
+    bool IsCurrent() const { return ring_ != nullptr && !ring::IsRetired(ring_); }
+    const void* Ring() const { return ring_; }
+
+  private:
+    bool Attach();
+    void Leave();
+
+    const base::Installation& installation_;
+    ring::StreamId id_;
+    ring::Demand demand_;
+    void* ring_ = nullptr;
+    ring::Position position_;
+    int last_sequence_ = ring::kNoSequence;
+};
+
+class RecorderTest : public testing::Test {
+  protected:
+    RecorderTest();
+    ~RecorderTest() override;
+
+    void MakeStore() const;
+    int AddCamera(const std::string& source, const std::optional<store::Credentials>& credentials = {}) const;
+    void ChangeCamera(int id, const std::function<void(store::Camera&)>& change) const;
+    Child StartRecorder(const std::string& no_data_limit_s = "1") const;
+    std::string Log() const;
+    std::size_t LogLines(const std::string& text) const;
+    std::size_t Segments() const;
+
+    std::filesystem::path home_;
+    std::optional<base::Installation> installation_;
+};
+
+// How many pictures or sound blocks come out of a decoder that is given these; stops at the first that it refuses.
+std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data, std::span<const Seen> entries);
+
+// Every run of entries that begins with a key frame decodes whole.
+void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames);
+
+}  // namespace lookhaven::test

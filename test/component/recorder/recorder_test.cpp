@@ -1,0 +1,244 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The recorder process against simulated cameras that misbehave, viewers that come and go, and its own death.
+#include <csignal>
+#include <ctime>
+
+#include <sys/wait.h>
+
+#include "standalone/base/clock.h"
+#include "test/component/recorder/recorder_fixture.h"
+#include "test/support/camera/mjpeg_camera.h"
+
+namespace lookhaven::test {
+
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+constexpr const char* kSmallPattern = "test:mjpeg?size=160x120&fps=25";
+
+TEST_F(RecorderTest, MotionJpegComesThroughByteByByte) {
+    MakeStore();
+    MjpegCamera plain;
+    MjpegCamera without_lengths;
+    without_lengths.SetMood(MjpegCamera::Mood::kNoLengths);
+    MjpegCamera guarded("viewer:se/cr@t");
+    const int cameras[] = {AddCamera(plain.Url()), AddCamera(without_lengths.Url()),
+                           AddCamera(guarded.Url(), store::Credentials{"viewer", "se/cr@t"})};
+    const Child recorder = StartRecorder();
+    for (const int camera : cameras) {
+        SCOPED_TRACE(camera);
+        Viewer viewer(*installation_, camera);
+        std::int64_t last = -1;
+        for (const Seen& seen : viewer.Take(30)) {
+            const std::int64_t number = MjpegCamera::NumberOf(seen.data);
+            ASSERT_GE(number, 0) << "a frame that the camera never sent";
+            EXPECT_TRUE(last < 0 || number == last + 1) << number << " after " << last;
+            EXPECT_TRUE(seen.key_frame);
+            last = number;
+        }
+    }
+    EXPECT_EQ(LogLines("cr@t") + LogLines("cr%40t"), 0u) << "a password in the log";
+}
+
+TEST_F(RecorderTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
+    MakeStore();
+    MjpegCamera camera;
+    Viewer viewer(*installation_, AddCamera(camera.Url()));
+    const Child recorder = StartRecorder();
+    viewer.Take(5);
+    const std::size_t descriptors = recorder.Count("fd");
+    const std::size_t threads = recorder.Count("task");
+    const std::size_t segments = Segments();
+    const void* ring = viewer.Ring();
+    for (const char* trouble : {"stalls", "vanishes", "sends huge frames", "sends a page"}) {
+        SCOPED_TRACE(trouble);
+        const bool vanishes = trouble[0] == 'v';
+        if (vanishes) {
+            camera.Vanish();
+        } else if (trouble[0] == 's') {
+            camera.SetMood(std::string(trouble) == "stalls"         ? MjpegCamera::Mood::kStall
+                           : std::string(trouble) == "sends a page" ? MjpegCamera::Mood::kPage
+                                                                    : MjpegCamera::Mood::kHuge);
+        }
+        // A page is seen by a new connection only.
+        if (std::string(trouble) == "sends a page") {
+            camera.Vanish();
+            camera.Return();
+        }
+        ASSERT_TRUE(Eventually([&] { return !viewer.HasPicture(); })) << "an old picture passes for a live one";
+        camera.SetMood(MjpegCamera::Mood::kFlow);
+        if (vanishes) {
+            camera.Return();
+        }
+        EXPECT_GE(MjpegCamera::NumberOf(viewer.Next().data), 0);
+    }
+    EXPECT_EQ(viewer.Ring(), ring) << "a camera that returns unchanged keeps its ring";
+    EXPECT_EQ(recorder.Count("fd"), descriptors);
+    EXPECT_EQ(recorder.Count("task"), threads);
+    EXPECT_EQ(Segments(), segments);
+    EXPECT_EQ(camera.Connections(), 1);
+}
+
+TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
+    MakeStore();
+    MjpegCamera page;
+    page.SetMood(MjpegCamera::Mood::kPage);
+    Viewer good(*installation_, AddCamera(kSmallPattern));
+    ring::Demand demand(*installation_);
+    const std::vector<std::pair<std::string, std::string>> bad{
+        {"test:nonsense", "no test pattern"},
+        {"test:mjpeg?size=1x1", "has a size"},
+        {"file:" + (home_ / "missing.mkv").string(), "no regular file"},
+        {"file:/dev/zero", "no regular file"},
+        {"file:" + (home_ / "log/recorder").string(), "cannot open"},
+        {"http://127.0.0.1:1/", "Connection refused"},
+        {"rtsp://127.0.0.1:1/", "Connection refused"},
+        {page.Url(), "does not answer with Motion JPEG"},
+    };
+    for (const auto& [source, message] : bad) {
+        demand.Touch({AddCamera(source), 0});
+    }
+    const Child recorder = StartRecorder();
+    for (const auto& [source, message] : bad) {
+        EXPECT_TRUE(Eventually([&] { return good.HasPicture() && LogLines(message) > 0; })) << source << message;
+    }
+    std::int64_t last_us = good.Next().timestamp_us;
+    for (const Seen& seen : good.Take(50)) {
+        EXPECT_LE(seen.timestamp_us - last_us, 200'000);
+        last_us = seen.timestamp_us;
+    }
+    EXPECT_EQ(Segments(), 1u);
+    EXPECT_EQ(LogLines("does not answer with Motion JPEG"), 1u) << "a line for each attempt";
+}
+
+TEST_F(RecorderTest, StreamRunsWhileItIsWanted) {
+    MakeStore();
+    const int camera = AddCamera(kSmallPattern);
+    const Child recorder = StartRecorder();
+    ASSERT_TRUE(Eventually([&] { return LogLines("started") > 0; }));
+    ASSERT_EQ(Segments(), 0u) << "runs unwanted";
+    const std::int64_t wanted_us = base::MonotonicMicros();
+    {
+        Viewer viewer(*installation_, camera);
+        viewer.Next();
+        EXPECT_LT(base::MonotonicMicros() - wanted_us, 1'000'000);
+    }
+    // Viewers may be silent for a pause of ten seconds.
+    ASSERT_TRUE(Eventually([&] { return Segments() == 0; }, seconds(30)));
+    EXPECT_GE(base::MonotonicMicros() - wanted_us, 15'000'000);
+    EXPECT_TRUE(Eventually([&] { return recorder.Count("task") == 1; }));
+}
+
+TEST_F(RecorderTest, ChangesOfACameraTouchThatCameraAlone) {
+    MakeStore();
+    const int changed = AddCamera(kSmallPattern);
+    const int other = AddCamera(kSmallPattern);
+    const Child recorder = StartRecorder();
+    Viewer viewer(*installation_, changed);
+    Viewer other_viewer(*installation_, other);
+    viewer.Next();
+    other_viewer.Next();
+    ChangeCamera(changed, [](store::Camera& camera) { camera.profiles[0].source = "test:mjpeg?size=320x240"; });
+    ASSERT_TRUE(Eventually([&] { return viewer.Next(), ring::Width(viewer.Ring()) == 320; }));
+    ChangeCamera(changed, [](store::Camera& camera) { camera.enabled = false; });
+    EXPECT_TRUE(Eventually([&] { return !viewer.HasPicture() && Segments() == 1; }));
+    other_viewer.Next();
+    EXPECT_EQ(LogLines("camera " + std::to_string(other) + " \"Camera\" stream 0: live"), 1u);
+}
+
+TEST_F(RecorderTest, WaitsForTheStore) {
+    const Child recorder = StartRecorder();
+    ASSERT_TRUE(Eventually([&] { return LogLines("cannot read the cameras") > 0; }));
+    const std::int64_t failed_us = base::MonotonicMicros();
+    ASSERT_TRUE(Eventually([&] { return base::MonotonicMicros() > failed_us + 2'500'000; }));
+    EXPECT_EQ(LogLines("cannot read the cameras"), 1u) << "a line for each attempt";
+    MakeStore();
+    Viewer(*installation_, AddCamera(kSmallPattern)).Next();
+}
+
+TEST_F(RecorderTest, EndsInOrder) {
+    MakeStore();
+    MjpegCamera stalled;
+    stalled.SetMood(MjpegCamera::Mood::kStall);
+    Viewer live(*installation_, AddCamera("test:h264?size=160x120&audio=aac"));
+    ring::Demand demand(*installation_);
+    demand.Touch({AddCamera(stalled.Url()), 0});
+    demand.Touch({AddCamera("http://127.0.0.1:1/"), 0});
+    for (const int signal : {SIGTERM, SIGINT}) {
+        Child recorder = StartRecorder("60");
+        ASSERT_TRUE(Eventually([&] { return live.HasPicture() && stalled.Connections() == 1; }));
+        recorder.Signal(signal);
+        EXPECT_EQ(recorder.Wait(seconds(2)), 0) << "signal " << signal;
+        EXPECT_EQ(Segments(), 0u) << "signal " << signal;
+        EXPECT_TRUE(Eventually([&] { return stalled.Connections() == 0; }));
+    }
+}
+
+TEST_F(RecorderTest, SuccessorOfAKilledRecorderGoesOnInItsRings) {
+    MakeStore();
+    const int camera = AddCamera("test:h264?size=160x120&audio=aac");
+    Viewer viewer(*installation_, camera);
+    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Child first = StartRecorder();
+    const Seen before = viewer.Next();
+    listener.Next();
+    const void* rings[] = {viewer.Ring(), listener.Ring()};
+    first.Signal(SIGKILL);
+    ASSERT_TRUE(first.Wait());
+    const Child second = StartRecorder();
+    Seen after;
+    ASSERT_TRUE(Eventually([&] { return (after = viewer.Next()).timestamp_us > before.timestamp_us + 500'000; }));
+    listener.Next();
+    EXPECT_TRUE(viewer.Ring() == rings[0] && listener.Ring() == rings[1]) << "viewers were sent away";
+    EXPECT_EQ(Segments(), 2u);
+}
+
+TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {
+    MakeStore();
+    Viewer viewer(*installation_, AddCamera(kSmallPattern));
+    const Child first = StartRecorder();
+    viewer.Next();
+    Child second = StartRecorder();
+    const std::optional<int> status = second.Wait();
+    ASSERT_TRUE(status && WIFEXITED(*status));
+    EXPECT_NE(WEXITSTATUS(*status), 0);
+    EXPECT_EQ(LogLines("another recorder runs for " + home_.string()), 1u);
+    viewer.Take(3);
+}
+
+TEST_F(RecorderTest, PatternDecodesWithSound) {
+    MakeStore();
+    const int camera = AddCamera("test:h264?size=320x240&gop=10&audio=aac");
+    const Child recorder = StartRecorder();
+    Viewer viewer(*installation_, camera);
+    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    const std::vector<Seen> pictures = viewer.Take(45);
+    const std::vector<Seen> blocks = listener.Take(100);
+    ExpectDecodesFromEveryKeyFrame(pictures, 4);
+    EXPECT_STREQ(ring::Codec(listener.Ring()), "AAC");
+    EXPECT_EQ(Decoded("aac", ring::ExtraData(listener.Ring()), blocks), blocks.size());
+    // One clock for both media, and it is the machine's.
+    const std::int64_t first_us = pictures.front().timestamp_us;
+    for (const Seen& block : blocks) {
+        EXPECT_GE(block.timestamp_us, first_us - 500'000);
+        EXPECT_LE(block.timestamp_us, base::MonotonicMicros());
+    }
+}
+
+TEST_F(RecorderTest, SilentCameraHasAnEmptyRingOfSound) {
+    MakeStore();
+    const int camera = AddCamera("test:h264?size=160x120");
+    const Child recorder = StartRecorder();
+    Viewer(*installation_, camera).Next();
+    EXPECT_EQ(Segments(), 2u);
+    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    EXPECT_FALSE(listener.HasPicture());
+    EXPECT_NE(listener.Ring(), nullptr);
+}
+
+}  // namespace
+
+}  // namespace lookhaven::test

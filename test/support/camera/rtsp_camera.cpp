@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A simulated RTSP camera: H.264 and AAC at rtsp://127.0.0.1:<port>/live, for any number of clients.
+//
+//   rtsp-camera <port>     0 takes a free one; the port is printed when the camera is ready
+//
+// SIGUSR1 withholds the picture, while the sound goes on; SIGUSR2 gives it back. To stall, stop the process (SIGSTOP);
+// to vanish, kill it. The pipeline ends with its parent.
+#include <csignal>
+#include <cstdio>
+#include <vector>
+
+#include <glib-unix.h>
+#include <gst/rtsp-server/rtsp-server.h>
+#include <sys/prctl.h>
+
+namespace {
+
+constexpr const char* kPipeline =
+    "( videotestsrc is-live=true pattern=ball ! video/x-raw,format=I420,width=320,height=240,framerate=25/1 "
+    "! valve name=picture ! x264enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
+    "! rtph264pay name=pay0 pt=96 config-interval=-1 "
+    "audiotestsrc is-live=true wave=ticks ! audio/x-raw,rate=16000,channels=1 ! avenc_aac bitrate=32000 "
+    "! rtpmp4gpay name=pay1 pt=97 )";
+
+bool g_withheld = false;
+std::vector<GstElement*> g_valves;  // of all clients
+
+void Withhold(bool on) {
+    g_withheld = on;
+    for (GstElement* valve : g_valves) {
+        g_object_set(valve, "drop", on ? TRUE : FALSE, nullptr);
+    }
+}
+
+void OnMedia(GstRTSPMediaFactory*, GstRTSPMedia* media, gpointer) {
+    GstElement* pipeline = gst_rtsp_media_get_element(media);
+    g_valves.push_back(gst_bin_get_by_name(GST_BIN(pipeline), "picture"));
+    gst_object_unref(pipeline);
+    Withhold(g_withheld);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+    gst_init(&argc, &argv);
+    GMainLoop* loop = g_main_loop_new(nullptr, FALSE);
+    GstRTSPServer* server = gst_rtsp_server_new();
+    gst_rtsp_server_set_address(server, "127.0.0.1");
+    gst_rtsp_server_set_service(server, argc > 1 ? argv[1] : "0");
+    GstRTSPMediaFactory* factory = gst_rtsp_media_factory_new();
+    gst_rtsp_media_factory_set_launch(factory, kPipeline);
+    g_signal_connect(factory, "media-configure", G_CALLBACK(OnMedia), nullptr);
+    GstRTSPMountPoints* mounts = gst_rtsp_server_get_mount_points(server);
+    gst_rtsp_mount_points_add_factory(mounts, "/live", factory);
+    g_object_unref(mounts);
+    if (gst_rtsp_server_attach(server, nullptr) == 0) {
+        std::fprintf(stderr, "rtsp-camera: cannot listen\n");
+        return 1;
+    }
+    g_unix_signal_add(
+        SIGUSR1, [](gpointer) -> gboolean { return Withhold(true), TRUE; }, nullptr);
+    g_unix_signal_add(
+        SIGUSR2, [](gpointer) -> gboolean { return Withhold(false), TRUE; }, nullptr);
+    std::printf("%d\n", gst_rtsp_server_get_bound_port(server));
+    std::fflush(stdout);
+    g_main_loop_run(loop);
+}
