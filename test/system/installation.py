@@ -1,0 +1,243 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# A whole installation for one test: started by script/server on free ports, in a state folder of its own.
+import contextlib
+import http.client
+import json
+import os
+import pathlib
+import re
+import signal
+import socket
+import subprocess
+import tempfile
+import time
+import urllib.parse
+
+ROOT = pathlib.Path(__file__).resolve().parents[2]
+BUILD = pathlib.Path(os.environ.get("LOOKHAVEN_BUILD_FOLDER", ROOT / "build/dev"))
+PASSWORDS = {"admin": "correct horse", "viewer": "battery staple"}
+LIVE = "VEXO.Lookhaven.Player.LiveviewSrc"
+
+
+def wait_until(condition, seconds, what):
+    """The first true value of condition(); fails with the last false one after that many seconds."""
+    deadline = time.monotonic() + seconds
+    while True:
+        value = condition()
+        if value:
+            return value
+        if time.monotonic() > deadline:
+            raise AssertionError(f"not within {seconds} s: {what}; last: {value!r}")
+        time.sleep(0.02)
+
+
+def free_port():
+    with socket.socket() as probe:
+        probe.bind(("127.0.0.1", 0))
+        return probe.getsockname()[1]
+
+
+def children(pid):
+    """Direct children by process id."""
+    try:
+        tasks = list(pathlib.Path(f"/proc/{pid}/task").iterdir())
+        return {int(child) for task in tasks for child in (task / "children").read_text().split()}
+    except OSError:
+        return set()
+
+
+def descendants(pid):
+    found = children(pid)
+    for child in list(found):
+        found |= descendants(child)
+    return found
+
+
+def program(pid):
+    """The base name of a process's program; empty once it is gone, a zombie included."""
+    with contextlib.suppress(OSError):
+        words = pathlib.Path(f"/proc/{pid}/cmdline").read_bytes().split(b"\0")[0].decode()
+        return words if words.startswith("nginx: ") else words.rsplit("/", 1)[-1]
+    return ""
+
+
+class Answer:
+    def __init__(self, response, body):
+        self.status = response.status
+        self.headers = response.headers
+        self.body = body
+
+    @property
+    def json(self):
+        return json.loads(self.body)
+
+    @property
+    def code(self):
+        return self.json["error"]["code"]
+
+
+class Installation:
+    """Use as a context manager; leaving it ends everything and removes the state folder."""
+
+    def __init__(self, **environment):
+        self._folder = tempfile.TemporaryDirectory(prefix="lookhaven-")
+        self.home = pathlib.Path(environment.pop("LOOKHAVEN_HOME", f"{self._folder.name}/home"))
+        self.port = int(environment.pop("LOOKHAVEN_PORT", free_port()))
+        self.tls_port = int(environment.pop("LOOKHAVEN_TLS_PORT", free_port()))
+        self.environment = {
+            **os.environ,
+            "LOOKHAVEN_HOME": str(self.home),
+            "LOOKHAVEN_PORT": str(self.port),
+            "LOOKHAVEN_TLS_PORT": str(self.tls_port),
+            "LOOKHAVEN_BUILD_FOLDER": str(BUILD),
+            **{f"LOOKHAVEN_{account.upper()}_PASSWORD": password for account, password in PASSWORDS.items()},
+            **environment,
+        }
+        self.server = None
+        self._sessions = {}
+
+    def __enter__(self):
+        self.start()
+        return self
+
+    def __exit__(self, *_):
+        self.stop()
+        self._folder.cleanup()
+
+    # --- the server script
+
+    def start(self):
+        """Returns what the script said once the server runs; fails with what it said when it ends before."""
+        self._output = open(f"{self._folder.name}/output", "w+b")
+        self.server = subprocess.Popen(
+            [ROOT / "script/server"], env=self.environment, stdin=subprocess.DEVNULL, stdout=self._output, stderr=self._output
+        )
+        wait_until(lambda: "Ctrl-C" in self.said() or self.server.poll() is not None, 60, "script/server is up")
+        if self.server.poll() is not None:
+            raise AssertionError(f"script/server ended: {self.said()}")
+
+    def said(self):
+        return pathlib.Path(self._output.name).read_text()
+
+    def stop(self, how=signal.SIGTERM):
+        """Ends the script and gives the processes that were its own and still run 5 s later; always none, or the test
+        fails."""
+        if self.server is None:
+            return
+        parts = descendants(self.server.pid)
+        self.server.send_signal(how)
+        self.server.wait(40)
+        self.server = None
+        self._output.close()
+        wait_until(lambda: not any(program(pid) for pid in parts), 10, f"all parts end after {how!r}")
+
+    def part(self, name):
+        """Process id of recorder, webapi or nginx; waits for it."""
+        wanted = {"nginx": "nginx:"}.get(name, f"lookhaven-{name}")
+        return wait_until(
+            lambda: next((pid for pid in children(self.server.pid) if program(pid).startswith(wanted)), None), 15, name
+        )
+
+    def requests(self):
+        """Process ids below the web API host, its watcher included."""
+        return descendants(self.part("webapi"))
+
+    def cli(self, *arguments, text=""):
+        done = subprocess.run(
+            [BUILD / "bin/lookhaven", *arguments], env=self.environment, input=text, capture_output=True, text=True, timeout=60
+        )
+        if done.returncode != 0:
+            raise AssertionError(f"lookhaven {' '.join(arguments)}: {done.stdout}{done.stderr}")
+        return done.stdout
+
+    # --- the web API
+
+    def request(self, query, account=None, form=None, headers=None, body=None, method=None, timeout=30):
+        """One request over plain HTTP; form makes it a POST. A query of pairs is escaped, a text goes as it is."""
+        connection, response = self.open(query, account, form, headers, body, method, timeout)
+        with contextlib.closing(connection):
+            return Answer(response, response.read())
+
+    def open(self, query, account=None, form=None, headers=None, body=None, method=None, timeout=30):
+        """The same, but the answer's body is left to the caller, who closes the connection."""
+        if not isinstance(query, str):
+            query = urllib.parse.urlencode(query)
+        headers = dict(headers or {})
+        if account:
+            headers["Cookie"] = f"id={self.session(account)}"
+        if form is not None:
+            body = urllib.parse.urlencode(form)
+            headers.setdefault("Content-Type", "application/x-www-form-urlencoded")
+        connection = http.client.HTTPConnection("127.0.0.1", self.port, timeout=timeout)
+        connection.request(method or ("GET" if body is None else "POST"), f"/webapi?{query}", body, headers)
+        return connection, connection.getresponse()
+
+    def login(self, account, password=None):
+        answer = self.request(
+            {"api": "VEXO.Auth", "version": 1, "method": "Login"},
+            form={"account": account, "password": password or PASSWORDS[account]},
+        )
+        if answer.status != 200:
+            raise AssertionError(f"log-in of {account}: {answer.status} {answer.body!r}")
+        return re.search(r"\bid=([^;]+)", answer.headers["Set-Cookie"])[1]
+
+    def session(self, account):
+        if account not in self._sessions:
+            self._sessions[account] = self.login(account)
+        return self._sessions[account]
+
+    def live(self, camera, account="admin", **parameters):
+        """A live stream as a Parts; the caller closes it."""
+        query = {"api": LIVE, "version": 1, "method": "Play", "camera": camera, **parameters}
+        connection, response = self.open(query, account)
+        return Parts(connection, response)
+
+
+class Parts:
+    """Reads a multipart answer part by part; bytes_per_second slows the reading down."""
+
+    def __init__(self, connection, response, bytes_per_second=None):
+        self.response = response
+        self._connection = connection
+        self._pace = bytes_per_second
+        self._began = time.monotonic()
+        self._read = 0
+
+    def __enter__(self):
+        return self
+
+    def __exit__(self, *_):
+        self.close()
+
+    def close(self):
+        self.response.close()
+        self._connection.close()
+
+    def slow_down(self, bytes_per_second):
+        self._pace, self._began, self._read = bytes_per_second, time.monotonic(), 0
+
+    def _wait_for_pace(self, count):
+        self._read += count
+        if self._pace:
+            time.sleep(max(0.0, self._read / self._pace - (time.monotonic() - self._began)))
+
+    def next(self):
+        """Header names in lower case with their values, and the picture; fails when the stream ends."""
+        line = self.response.readline()
+        while line and not line.startswith(b"--"):
+            line = self.response.readline()
+        if not line:
+            raise EOFError("the stream ended")
+        head = {}
+        while (line := self.response.readline().strip()):
+            name, _, value = line.decode().partition(":")
+            head[name.lower()] = value.strip()
+        picture = b""
+        while len(picture) < int(head["content-length"]):
+            piece = self.response.read(min(16384, int(head["content-length"]) - len(picture)))
+            if not piece:
+                raise EOFError("the stream ended inside a part")
+            picture += piece
+            self._wait_for_pace(len(piece))
+        return head, picture

@@ -1,0 +1,153 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# script/server: what it says when it cannot start, what it leaves behind, what it sets up.
+import os
+import pathlib
+import signal
+import socket
+import ssl
+import subprocess
+import tempfile
+import time
+import unittest
+
+from installation import ROOT, Installation, free_port, wait_until
+
+
+def refusal(server):
+    """What script/server says on a start that must fail, and how long it took."""
+    began = time.monotonic()
+    done = subprocess.run(
+        [ROOT / "script/server"], env=server.environment, stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=60
+    )
+    if done.returncode == 0:
+        raise AssertionError(f"script/server started: {done.stdout}")
+    return done.stderr.strip(), time.monotonic() - began
+
+
+class ServerTest(unittest.TestCase):
+    def test_each_refusal_is_one_sentence_at_once(self):
+        with socket.create_server(("127.0.0.1", 0)) as taken, tempfile.TemporaryDirectory() as folder:
+            port = taken.getsockname()[1]
+            file = pathlib.Path(folder, "file")
+            file.touch()
+            rows = [
+                ("taken port", {"LOOKHAVEN_PORT": str(port)}, [str(port), "LOOKHAVEN_PORT="]),
+                ("taken TLS port", {"LOOKHAVEN_TLS_PORT": str(port)}, [str(port), "LOOKHAVEN_TLS_PORT="]),
+                ("port of root", {"LOOKHAVEN_PORT": "80"}, ["80", "1024"]),
+                ("port of letters", {"LOOKHAVEN_PORT": "web"}, ["web", "1024"]),
+                ("the same port twice", dict.fromkeys(["LOOKHAVEN_PORT", "LOOKHAVEN_TLS_PORT"], str(free_port())), ["both"]),
+                ("read-only folder", {"LOOKHAVEN_HOME": "/proc/lookhaven"}, ["/proc/lookhaven", "LOOKHAVEN_HOME"]),
+                ("folder that is a file", {"LOOKHAVEN_HOME": str(file)}, [str(file), "LOOKHAVEN_HOME"]),
+                ("folder too long for a socket", {"LOOKHAVEN_HOME": f"{folder}/{'a' * 90}"}, ["too long"]),
+                ("folder with a quote", {"LOOKHAVEN_HOME": f'{folder}/a"b'}, ['a"b', "LOOKHAVEN_HOME"]),
+            ]
+            for name, environment, words in rows:
+                with self.subTest(name):
+                    said, took = refusal(Installation(**environment))
+                    self.assertEqual(len(said.splitlines()), 1, said)
+                    for word in words:
+                        self.assertIn(word, said)
+                    self.assertLess(took, 5)
+
+    def test_missing_package_offline_is_one_sentence(self):
+        with tempfile.TemporaryDirectory() as folder:
+            for name, body in {
+                "dpkg-query": '/usr/bin/dpkg-query "$@" | grep -v " libsodium-dev$"',
+                "apt-get": 'case "$*" in *install*) echo "E: Unable to fetch some archives"; exit 100 ;; esac',
+            }.items():
+                pathlib.Path(folder, name).write_text(f"#!/bin/sh\n{body}\n")
+                pathlib.Path(folder, name).chmod(0o755)
+            server = Installation(PATH=f"{folder}:{os.environ['PATH']}", LOOKHAVEN_BUILD_FOLDER="")
+            said, _ = refusal(server)
+            self.assertEqual(len(said.splitlines()), 1, said)
+            for word in ("libsodium-dev", "Unable to fetch", "apt-get install"):
+                self.assertIn(word, said)
+
+    def test_second_start_on_the_same_folder(self):
+        with Installation() as first:
+            second = Installation(LOOKHAVEN_HOME=str(first.home))
+            said, took = refusal(second)
+            self.assertIn(f"kill {first.server.pid}", said)
+            self.assertEqual(len(said.splitlines()), 1, said)
+            self.assertLess(took, 5)
+            self.assertEqual(first.request("api=VEXO.Auth&version=1&method=Status", "admin").status, 200)
+
+    def test_whatever_ends_the_script_leaves_nothing_running_and_the_next_start_works(self):
+        with Installation() as server:
+            password_line = server.said()
+            for how in (signal.SIGTERM, signal.SIGINT, signal.SIGHUP, signal.SIGKILL):
+                with self.subTest(how):
+                    server.stop(how)
+                    server.start()
+                    self.assertIn("set at the first start", server.said())
+                    server.login("admin")
+            self.assertIn("correct horse", password_line)
+
+    def test_passwords_are_generated_when_none_is_given(self):
+        with Installation(LOOKHAVEN_ADMIN_PASSWORD="", LOOKHAVEN_VIEWER_PASSWORD="") as server:
+            said = dict(line.split(None, 1) for line in server.said().splitlines() if len(line.split()) == 2)
+            for account in ("admin", "viewer"):
+                self.assertGreaterEqual(len(said[account]), 12)
+                server.login(account, said[account])
+
+    def test_parts_run_without_privilege_and_in_private_folders(self):
+        with Installation() as server:
+            for part in ("recorder", "webapi", "nginx"):
+                status = pathlib.Path(f"/proc/{server.part(part)}/status").read_text()
+                self.assertIn("CapEff:\t0000000000000000", status, part)
+                self.assertIn("NoNewPrivs:\t1", status, part)
+            for folder in ("", "run", "tls", "log"):
+                self.assertEqual((server.home / folder).stat().st_mode & 0o077, 0, folder)
+            self.assertEqual((server.home / "tls/key.pem").stat().st_mode & 0o077, 0)
+
+    def test_https_on_every_address_and_http_on_loopback_only(self):
+        with Installation() as server:
+            listening = subprocess.run(["ss", "-Hltn"], capture_output=True, text=True, check=True).stdout
+            local = {line.split()[3] for line in listening.splitlines()}
+            self.assertIn(f"127.0.0.1:{server.port}", local)
+            self.assertNotIn(f"0.0.0.0:{server.port}", local)
+            self.assertIn(f"0.0.0.0:{server.tls_port}", local)
+            context = ssl.create_default_context(cafile=server.home / "tls/certificate.pem")
+            context.set_alpn_protocols(["h2"])
+            with socket.create_connection(("127.0.0.1", server.tls_port)) as plain:
+                with context.wrap_socket(plain, server_hostname="localhost") as secure:
+                    self.assertEqual(secure.selected_alpn_protocol(), "h2")
+
+    def test_client_comes_with_strict_headers(self):
+        with Installation() as server:
+            page = subprocess.run(
+                ["curl", "-si", f"http://127.0.0.1:{server.port}/"], capture_output=True, text=True, check=True
+            ).stdout
+            self.assertIn("Content-Security-Policy: default-src 'self'", page)
+            self.assertNotIn("unsafe", page)
+            self.assertIn("Cache-Control: no-cache", page)
+            asset = page.split('src="./')[1].split('"')[0]
+            warning = "webman/3rdparty/Lookhaven/resources/images/2x/components/icon_indicator_warning.png"
+            for path, kind, caching in ((asset, "application/javascript", "immutable"), (warning, "image/png", "no-cache")):
+                head = subprocess.run(
+                    ["curl", "-sI", f"http://127.0.0.1:{server.port}/{path}"], capture_output=True, text=True, check=True
+                ).stdout
+                self.assertIn("200 OK", head, path)
+                self.assertIn(kind, head)
+                self.assertIn(caching, head)
+
+    def test_a_part_that_ends_comes_back(self):
+        with Installation() as server:
+            for part in ("recorder", "webapi", "nginx"):
+                old = server.part(part)
+                os.kill(old, signal.SIGKILL)
+                self.assertNotEqual(wait_until(lambda: server.part(part) if server.part(part) != old else 0, 10, part), old)
+            wait_until(lambda: answers(server), 10, "everything answers again")
+            self.assertIn("recorder ended", server.said())
+
+
+def answers(server):
+    try:
+        return server.request("api=VEXO.Auth&version=1&method=Status", "admin").status == 200
+    except OSError:
+        return False
+
+
+if __name__ == "__main__":
+    unittest.main()
