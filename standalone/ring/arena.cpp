@@ -129,11 +129,12 @@ void Arena::Append(const Place& place, const Frame& frame, bool is_key) {
     slot.place.store(place.Word());
     slot.count.store(count);
     newest_ = count;
+    // Readers go no further than the newest count, so it is raised before anything else names the entry.
+    head.newest.store(count);
     if (is_key) {
         head.newest_key.store(count);
         has_lost_key_frame_ = false;
     }
-    head.newest.store(count);
     head.heartbeat_micros.store(base::MonotonicMicros());
     Wake(head.wake);
 }

@@ -3,12 +3,11 @@
 
 #include <array>
 #include <cerrno>
-#include <cstring>
-#include <ctime>
+#include <chrono>
 #include <filesystem>
 #include <new>
-#include <optional>
 #include <system_error>
+#include <thread>
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -94,15 +93,20 @@ base::SharedMapping MapOrMake(const base::Installation& installation) {
     return base::SharedMapping(path, sizeof(RecordFile));
 }
 
-// Holds the record's lock, taken over from a dead owner if need be.
+// Holds the record's lock, taken over from a dead owner if need be. Tried for a second: others hold it for a few loads, so
+// one that is still held then belongs to a stopped process.
 class Lock {
   public:
     explicit Lock(pthread_mutex_t& mutex) : mutex_(mutex) {
-        timespec deadline{};
-        clock_gettime(CLOCK_MONOTONIC, &deadline);
-        ++deadline.tv_sec;
-        const int error = pthread_mutex_clocklock(&mutex, CLOCK_MONOTONIC, &deadline);
-        held_ = error == 0 || (error == EOWNERDEAD && pthread_mutex_consistent(&mutex) == 0);
+        for (int tries = 0; tries < 1000; ++tries) {
+            const int error = pthread_mutex_trylock(&mutex);
+            if (error == EBUSY) {
+                std::this_thread::sleep_for(std::chrono::milliseconds(1));
+                continue;
+            }
+            held_ = error == 0 || (error == EOWNERDEAD && pthread_mutex_consistent(&mutex) == 0);
+            return;
+        }
     }
     ~Lock() {
         if (held_) {
@@ -116,7 +120,7 @@ class Lock {
 
   private:
     pthread_mutex_t& mutex_;
-    bool held_;
+    bool held_ = false;
 };
 
 }  // namespace

@@ -111,10 +111,12 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position) {
     }
     const SegmentHead& head = reading.Head();
     const std::uint64_t last = reading.LastCount(last_sequence);
-    if (last != 0 && last == head.newest.load()) {
+    const std::uint64_t newest = head.newest.load();
+    if (last == newest) {
         return nullptr;
     }
-    if (reading.IsLive(last)) {
+    // Never past the newest: the entry behind it may be named already by a writer that dies before it counts.
+    if (last < newest && reading.IsLive(last)) {
         if (const Entry* entry = reading.Pin(last + 1)) {
             return entry;
         }
