@@ -4,6 +4,8 @@
 #include <stdexcept>
 #include <string>
 
+#include <malloc.h>
+
 #include "platform/log/dbglogcfg.h"
 #include "standalone/base/debug_log_config.h"
 #include "standalone/base/log.h"
@@ -50,7 +52,11 @@ store::Store& RequestContext::Records() {
 }
 
 void RequestContext::CloseRecords() {
-    records_.reset();
+    if (records_ != nullptr) {
+        records_.reset();
+        // What the store worked with is half of a viewer's own memory, and there may be hundreds of viewers.
+        ::malloc_trim(0);
+    }
 }
 
 void RequestContext::NoteStream() {
