@@ -83,8 +83,7 @@ class Installation:
     def __init__(self, **environment):
         self._folder = tempfile.TemporaryDirectory(prefix="lookhaven-")
         self.home = pathlib.Path(environment.pop("LOOKHAVEN_HOME", f"{self._folder.name}/home"))
-        self.port = int(environment.pop("LOOKHAVEN_PORT", free_port()))
-        self.tls_port = int(environment.pop("LOOKHAVEN_TLS_PORT", free_port()))
+        self.port, self.tls_port = free_port(), free_port()
         self.environment = {
             **os.environ,
             "LOOKHAVEN_HOME": str(self.home),
@@ -103,6 +102,9 @@ class Installation:
 
     def __exit__(self, *_):
         self.stop()
+        self.discard()
+
+    def discard(self):
         self._folder.cleanup()
 
     # --- the server script

@@ -20,6 +20,7 @@ def refusal(server):
     done = subprocess.run(
         [ROOT / "script/server"], env=server.environment, stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=60
     )
+    server.discard()
     if done.returncode == 0:
         raise AssertionError(f"script/server started: {done.stdout}")
     return done.stderr.strip(), time.monotonic() - began
