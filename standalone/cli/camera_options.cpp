@@ -5,7 +5,7 @@
 #include <charconv>
 #include <map>
 
-#include "standalone/cli/console.h"
+#include "standalone/cli/commands.h"
 
 namespace lookhaven::cli {
 
@@ -50,10 +50,9 @@ void AssignIfGiven(T& target, const std::optional<T>& given) {
 
 void CameraOptions::AddTo(CLI::App& command) {
     command.add_option("--name", name_, "What the camera is called");
-    command.add_option("--type", type_, "mjpeg, h264 or h265 (else found out)")
-        ->transform(CLI::CheckedTransformer(kTypes));
-    command.add_option("--live", live_profile_, "The profile of the live view: high (at first), low or mobile")
-        ->transform(CLI::CheckedTransformer(kProfiles));
+    Choose(command.add_option("--type", type_, "How the video is coded (else found out)"), kTypes);
+    Choose(command.add_option("--live", live_profile_, "The profile that the live view shows (high at first)"),
+           kProfiles);
     command.add_flag("--enable,!--disable", enabled_, "Whether it is shown and recorded");
     command.add_flag("--ptz,!--no-ptz", ptz_, "Whether it moves");
     command.add_flag("--audio,!--no-audio", audio_, "Whether it hears");

@@ -4,11 +4,24 @@
 // outlive the program.
 #pragma once
 
+#include <map>
+#include <string>
+
 #include <CLI/CLI.hpp>
 
 #include "standalone/cli/console.h"
 
 namespace lookhaven::cli {
+
+// Makes the option take the map's names, and show them as its form.
+template <typename T>
+CLI::Option* Choose(CLI::Option* option, const std::map<std::string, T>& names) {
+    std::string form;
+    for (const auto& entry : names) {
+        form += (form.empty() ? "" : "|") + entry.first;
+    }
+    return option->transform(CLI::CheckedTransformer(names).description(""))->type_name(form);
+}
 
 void AddInit(CLI::App& program, Console& console);
 void AddLog(CLI::App& program, Console& console);

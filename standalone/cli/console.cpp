@@ -40,8 +40,8 @@ std::string ReadLine() {
 }
 
 std::string Ask(const std::string& prompt) {
-    std::cerr << prompt << std::flush;
     const EchoOff silence;
+    std::cerr << prompt << std::flush;
     std::string line = ReadLine();
     std::cerr << '\n';
     return line;

@@ -100,13 +100,15 @@ void AddLog(CLI::App& program, Console& console) {
     log->add_subcommand("show", "Shows the levels")->callback([&console] { Show(console); });
     CLI::App* set = log->add_subcommand("set", "Sets the level of categories or processes, or of every category");
     auto change = std::make_shared<Change>();
-    set->add_option("level", change->level, "off, error, warning, notice, info or debug")
-        ->required()
-        ->transform(CLI::CheckedTransformer(kLevels));
-    set->add_option("--category", change->categories, "liveview, player or a number; may be repeated")
-        ->transform(CLI::Transformer(kCategories))
+    Choose(set->add_option("level", change->level, "What is logged: this and all that is worse"), kLevels)->required();
+    set->add_option("--category", change->categories, "A category by name or number; may be repeated")
+        ->allow_extra_args(false)
+        ->transform(CLI::Transformer(kCategories).description(""))
+        ->type_name("liveview|player|NUMBER")
         ->check(CLI::Range(0, base::kDebugLogCategoryCount - 1));
-    set->add_option("--process", change->processes, "A process id; may be repeated")->check(CLI::PositiveNumber);
+    set->add_option("--process", change->processes, "A process id; may be repeated")
+        ->allow_extra_args(false)
+        ->check(CLI::PositiveNumber);
     set->callback([&console, change] { Set(console, *change); });
 }
 

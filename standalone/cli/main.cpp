@@ -47,11 +47,15 @@ std::string FullName(const CLI::App& command) {
 // CLI11's own words repeat the arguments, and a password that was given by mistake would show again.
 std::string UsageSentence(const CLI::App& program, const CLI::ParseError& error) {
     const std::string name = FullName(Innermost(program));
-    const bool is_excess = dynamic_cast<const CLI::ExtrasError*>(&error) != nullptr;
-    const bool quotes_input = is_excess || dynamic_cast<const CLI::ConversionError*>(&error) != nullptr;
-    const std::string what = is_excess      ? "there are arguments that " + name + " does not take"
-                             : quotes_input ? "an argument of " + name + " has a wrong form"
-                                            : std::string(error.what());
+    const std::string words = error.what();
+    std::string what = words;
+    if (dynamic_cast<const CLI::ExtrasError*>(&error) != nullptr) {
+        what = "there are arguments that " + name + " does not take";
+    } else if (dynamic_cast<const CLI::ConversionError*>(&error) != nullptr) {
+        what = "an argument of " + name + " has a wrong form";
+    } else if (dynamic_cast<const CLI::ValidationError*>(&error) != nullptr) {
+        what = words.substr(0, words.find(':')) + " does not take such a value";
+    }
     return what + ": see " + name + " --help";
 }
 
@@ -89,7 +93,7 @@ int Run(int argc, char** argv) {
     } catch (const store::StoreError& error) {
         return Report(console, kUnavailable, error.what());
     } catch (const media::SourceError& error) {
-        return Report(console, kUnavailable, error.what());
+        return Report(console, kUnavailable, std::string("the source cannot be used (") + error.what() + ")");
     } catch (const std::system_error& error) {
         return Report(console, CodeOf(error), error.what());
     } catch (const std::bad_alloc&) {

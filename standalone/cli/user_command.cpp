@@ -135,9 +135,8 @@ void AddUser(CLI::App& program, Console& console) {
         added->callback([&console, request, run] { run(console, *request); });
         return added;
     };
-    command("add", "Makes an account; its password is asked for", Add)
-        ->add_option("--privilege", request->privilege, "owner, manager or viewer (the default)")
-        ->transform(CLI::CheckedTransformer(kPrivileges));
+    CLI::App* add = command("add", "Makes an account; its password is asked for", Add);
+    Choose(add->add_option("--privilege", request->privilege, "How much it may do (else viewer)"), kPrivileges);
     group->add_subcommand("list", "Lists the accounts")->callback([&console] { List(console); });
     command("passwd", "Changes a password and ends the account's sessions", SetPassword);
     command("remove", "Removes an account and ends its sessions", Remove);
@@ -146,8 +145,8 @@ void AddUser(CLI::App& program, Console& console) {
                   [](const Console&c, const Request&r) { Permit(c, r, false); }),
           command("allow", "Allows a camera again", [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
         permit->add_option("camera", request->camera, "The camera's id")->required();
-        permit->add_option("--kind", request->kinds, "live, playback or audio; may be repeated (else all three)")
-            ->transform(CLI::CheckedTransformer(kAccess));
+        Choose(permit->add_option("--kind", request->kinds, "What exactly; may be repeated (else everything)"), kAccess)
+            ->allow_extra_args(false);
     }
 }
 

@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "test/component/cli/program.h"
+
+#include <array>
+#include <cstdlib>
+
+#include <fcntl.h>
+#include <poll.h>
+#include <pty.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "standalone/base/file.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+constexpr uid_t kNobody = 65534;
+constexpr int kLimitMs = 20'000;
+
+std::vector<std::string> Words(const std::string& line) {
+    std::vector<std::string> words;
+    bool quoted = false;
+    bool open = false;
+    for (const char c : line) {
+        if (c == '\'') {
+            quoted = !quoted;
+        }
+        const bool blank = c == ' ' && !quoted;
+        if (!blank && !open) {
+            words.emplace_back();
+        }
+        open = !blank;
+        if (!blank && c != '\'') {
+            words.back() += c;
+        }
+    }
+    return words;
+}
+
+[[noreturn]] void Execute(const std::string& line, const std::filesystem::path& home) {
+    ::setenv("LOOKHAVEN_HOME", home.c_str(), 1);
+    std::vector<std::string> words = Words(line);
+    words.insert(words.begin(), "lookhaven");
+    std::vector<char*> argv;
+    for (std::string& word : words) {
+        argv.push_back(word.data());
+    }
+    argv.push_back(nullptr);
+    ::execv(LOOKHAVEN_PROGRAM, argv.data());
+    _exit(127);
+}
+
+int ExitCode(pid_t child) {
+    int status = 0;
+    ::waitpid(child, &status, 0);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
+}
+
+// What comes until the end, or until the text ends with that prompt.
+std::string ReadUntil(int descriptor, const std::string& prompt) {
+    std::string text;
+    std::array<char, 4096> block{};
+    while (prompt.empty() || !text.ends_with(prompt)) {
+        pollfd wait{descriptor, POLLIN, 0};
+        const ssize_t got = ::poll(&wait, 1, kLimitMs) == 1 ? ::read(descriptor, block.data(), block.size()) : -1;
+        if (got <= 0) {
+            return text;
+        }
+        text.append(block.data(), static_cast<std::size_t>(got));
+    }
+    return text;
+}
+
+}  // namespace
+
+CliTest::CliTest() {
+    std::string pattern = testing::TempDir() + "lookhaven-cli-XXXXXX";
+    folder_ = ::mkdtemp(pattern.data());
+    std::filesystem::permissions(folder_, std::filesystem::perms(0755));
+    home_ = folder_ / "home";
+}
+
+CliTest::~CliTest() {
+    std::filesystem::remove_all(folder_);
+}
+
+Outcome CliTest::Run(const std::string& line, const std::string& input, bool as_nobody) {
+    const std::filesystem::path input_file = folder_ / "input";
+    base::WriteFileAtomically(input_file, input);
+    int ends[2] = {-1, -1};
+    EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+    const pid_t child = ::fork();
+    if (child == 0) {
+        ::dup2(base::OpenFile(input_file, O_RDONLY).Get(), STDIN_FILENO);
+        ::dup2(ends[1], STDOUT_FILENO);
+        ::dup2(ends[1], STDERR_FILENO);
+        if (as_nobody && ::geteuid() == 0 && ::setuid(kNobody) != 0) {
+            _exit(126);
+        }
+        Execute(line, home_);
+    }
+    ::close(ends[1]);
+    const base::FileDescriptor output(ends[0]);
+    std::string text = ReadUntil(output.Get(), "");
+    return {ExitCode(child), std::move(text)};
+}
+
+Outcome CliTest::RunOnTerminal(const std::string& line, const std::vector<std::string>& answers) {
+    int terminal = -1;
+    const pid_t child = ::forkpty(&terminal, nullptr, nullptr, nullptr);
+    if (child == 0) {
+        Execute(line, home_);
+    }
+    const base::FileDescriptor owner(terminal);
+    std::string text;
+    for (const std::string& answer : answers) {
+        text += ReadUntil(terminal, ": ");
+        const std::string typed = answer + "\n";
+        EXPECT_EQ(::write(terminal, typed.data(), typed.size()), static_cast<ssize_t>(typed.size()));
+    }
+    text += ReadUntil(terminal, "");
+    return {ExitCode(child), std::move(text)};
+}
+
+void CliTest::SetUpDemo() {
+    ASSERT_EQ(Run("init --admin admin", std::string(kAdminPassword) + "\n").code, 0);
+    ASSERT_EQ(Run("demo setup", std::string(kViewerPassword) + "\n").code, 0);
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Runs the operator's command line as a user would, in a state folder of the test's own.
+#pragma once
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+namespace lookhaven::cli {
+
+struct Outcome {
+    int code = -1;
+    std::string text;  // standard output and standard error
+};
+
+class CliTest : public testing::Test {
+  protected:
+    CliTest();
+    ~CliTest() override;
+
+    // A line as in a shell, cut at blanks, where '…' keeps blanks. as_nobody: by a user who owns nothing.
+    Outcome Run(const std::string& line, const std::string& input = "", bool as_nobody = false);
+    // The same on a terminal, where the answers are typed as each prompt shows.
+    Outcome RunOnTerminal(const std::string& line, const std::vector<std::string>& answers);
+
+    // An installation with an owner "admin" and a viewer, their passwords as below, and the demo's cameras.
+    void SetUpDemo();
+
+    static constexpr const char* kAdminPassword = "admin-s3cret";
+    static constexpr const char* kViewerPassword = "viewer-s3cret";
+
+    std::filesystem::path folder_;
+    std::filesystem::path home_;
+};
+
+}  // namespace lookhaven::cli
