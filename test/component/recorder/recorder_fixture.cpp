@@ -137,6 +137,7 @@ RecorderTest::RecorderTest() {
 }
 
 RecorderTest::~RecorderTest() {
+    EXPECT_EQ(LogLines("Sanitizer") + LogLines("runtime error:"), 0u) << "a sanitizer stopped the recorder";
     if (HasFailure()) {
         std::printf("%s", Log().c_str());
     }
