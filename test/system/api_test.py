@@ -1,7 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # What the web API answers to good and bad requests, through the web server and straight at the host's socket.
-import json
 import pathlib
 import socket
 import time
@@ -137,10 +136,7 @@ class ApiTest(unittest.TestCase):
 
     def test_silent_camera_is_given_up_in_time_and_costs_the_others_nothing(self):
         with socket.create_server(("127.0.0.1", 0)) as silent:
-            added = self.server.cli(
-                "camera", "add", "--name", "Silent", "--source", f"http://127.0.0.1:{silent.getsockname()[1]}/", "--json"
-            )
-            camera = json.loads(added)["id"]
+            camera = self.server.add_camera("Silent", f"http://127.0.0.1:{silent.getsockname()[1]}/")
             began = time.monotonic()
             with ThreadPoolExecutor() as pool:
                 waiting = pool.submit(self.server.request, play(camera, snapshot=1), "admin")

@@ -153,6 +153,10 @@ class Installation:
             raise AssertionError(f"lookhaven {' '.join(arguments)}: {done.stdout}{done.stderr}")
         return done.stdout
 
+    def add_camera(self, name, source):
+        """The id of a new camera."""
+        return json.loads(self.cli("camera", "add", "--enable", "--name", name, "--source", source, "--json"))["id"]
+
     # --- the web API
 
     def request(self, query, account=None, form=None, headers=None, body=None, method=None, timeout=30):
@@ -235,6 +239,8 @@ class Parts:
         while (line := self.response.readline().strip()):
             name, _, value = line.decode().partition(":")
             head[name.lower()] = value.strip()
+        if "content-length" not in head:
+            raise EOFError("the stream ended inside a part's head")
         picture = b""
         while len(picture) < int(head["content-length"]):
             piece = self.response.read(min(16384, int(head["content-length"]) - len(picture)))
