@@ -6,6 +6,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
+#include <stdexcept>
 
 #include <unistd.h>
 
@@ -71,6 +72,9 @@ ScriptedPlatform::~ScriptedPlatform() {
 }
 
 void ScriptedPlatform::Record(const std::string& call) {
+    if (calls.size() == 10000) {
+        throw std::runtime_error("the script does not end");
+    }
     calls.push_back(call);
     if (on_call) {
         on_call(call);
