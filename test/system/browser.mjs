@@ -39,6 +39,7 @@ try {
 
   const tile = page.locator('[data-camera="1"]');
   await page.locator('[data-camera="1"][data-state="live"]').waitFor({ timeout: 15_000 });
+  await page.locator('[data-camera="4"][data-state="live"]').waitFor({ timeout: 15_000 });
   await page.screenshot({ path: `${folder}/wall.png` });
   // The clock of the test pattern shows tenths at least; three pictures a second apart, so that one repeated by chance is not taken
   // for standing still.
