@@ -4,7 +4,6 @@
 #pragma once
 
 #include <algorithm>
-#include <algorithm>
 #include <array>
 #include <cstdint>
 #include <cstdio>
