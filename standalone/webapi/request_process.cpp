@@ -67,11 +67,11 @@ std::string RunEntry(EntryFunction entry, VEXO::APIRequest::Context& asked) {
     if (given.answer && given.output_enabled) {
         return JsonAnswer(200, *given.answer);
     }
-    if (!asked.login) {
-        throw Failure(401, "no session");
-    }
     if (context.IsStream()) {
         throw Failure(504, "no picture came");
+    }
+    if (!asked.login) {
+        throw Failure(401, "no session");
     }
     throw Failure(502, "the handler gave no answer");
 }

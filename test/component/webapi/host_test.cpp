@@ -74,7 +74,7 @@ TEST(Host, GivesTheAnswerThatFits) {
         {test + "Success", std::string(5000, 'x'), 401},
         {live + "Success", "", 200},
         {live + "Nothing", "", 401},
-        {live + "EmptyStream", "", 401},
+        {live + "EmptyStream", "", 504},
         {live + "EmptyStream", admin, 504},
         {live + "Nothing", admin, 502},
         {test + "Missing", admin, 404},
