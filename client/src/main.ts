@@ -4,9 +4,11 @@
 //
 //   wire/   what comes over the network: the web API (server), the parts of an endless answer (multipart),
 //           requests that end in time (deadline)
-//   live/   how a picture is kept live: sources of pictures behind one interface (source: mjpeg_source streams,
+//   live/   how a picture is kept live: sources of pictures behind one interface (source: stream_source streams,
 //           snapshot_source polls), reconnecting (feed, backoff), the verdict on what is shown (signal_state), and the
-//           sharing of few connections (stream_budget, turns)
+//           sharing of few connections (stream_budget, turns). Of a compressed stream, media_part tells the pieces apart;
+//           video_player decodes the picture (annexb, frame_gate), sound the sound (speaker_worklet with its
+//           jitter_buffer), and av_clock keeps them in step. An obstacle is why that cannot be done here.
 //   ui/     what is on the screen: login; wall with grid and tiles; large_view; snapshot_dialog. A picture is one
 //           camera's canvas with its messages. The address says which camera is large (route).
 //

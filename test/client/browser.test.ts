@@ -2,8 +2,20 @@
 //
 // The built client in a real browser: which connections it holds, what it says of a silent camera, keyboard and phone.
 
+import { execFileSync } from "node:child_process";
 import { Browser, hasBrowser, type Page } from "./browser";
 import { FakeServer } from "./fake_server";
+
+/** Pictures of H.264 that are white for the first four of each 25, else black. */
+function flashes(): Buffer[] {
+  const source = "color=black:s=320x180:r=25:d=2,drawbox=color=white:t=fill:enable='lt(mod(n\\,25)\\,4)'";
+  const encode = ["-c:v", "libx264", "-preset", "ultrafast", "-bf", "0", "-g", "25", "-x264-params", "aud=1"];
+  const video = execFileSync("ffmpeg", ["-v", "error", "-f", "lavfi", "-i", source, ...encode, "-f", "h264", "-"]);
+  const delimiter = Buffer.from([0, 0, 0, 1, 9]);
+  const starts: number[] = [];
+  for (let at = 0; at >= 0; at = video.indexOf(delimiter, at + 1)) starts.push(at);
+  return starts.map((start, index) => video.subarray(start, starts[index + 1]));
+}
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
   const server = new FakeServer();
@@ -19,6 +31,9 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       return canvas.toDataURL("image/jpeg").split(",")[1]!;
     });
     server.jpeg = Buffer.from(picture, "base64");
+    server.muxed.set(12, { type: "H264", pictures: flashes(), isLoud: (number) => number % 25 < 4 });
+    const unplayable = Buffer.from("0000000142010101600000030090000003000003003fa0050201000000012601af", "hex");
+    server.muxed.set(13, { type: "H265", pictures: [unplayable], isLoud: () => false });
     await page.send("Page.close", {});
   }, 30_000);
 
@@ -27,12 +42,12 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     server.close();
   });
 
-  async function loggedIn(cameras: number, widthPx = 1440, heightPx = 900): Promise<Page> {
+  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900): Promise<Page> {
     server.hasSession = false;
     server.stalled.clear();
     server.cameras.length = 0;
-    for (let id = 1; id <= cameras; id += 1)
-      server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: id === 2 ? 3 : 1 });
+    for (const id of typeof cameras === "number" ? Array.from({ length: cameras }, (_, index) => index + 1) : cameras)
+      server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: server.muxed.has(id) ? 3 : 1 });
     const page = await browser.open(address, widthPx, heightPx);
     await page.until(() => document.querySelector(".login") !== null);
     await page.run(() => {
@@ -53,16 +68,15 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
 
   test("four tiles stream and the others poll in turns; what is not seen has no connection", async () => {
     const page = await loggedIn(9);
-    await open(["1/1", "3/1", "4/1", "5/1"]);
-    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 8);
+    await open(["1/1", "2/1", "3/1", "4/1"]);
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 9);
     await vi.waitFor(() => expect(server.polls).toBeGreaterThan(7), 5000);
     expect(server.mostPollsAtOnce).toBe(1);
     await page.click("[data-camera='3'] .tile-open");
     await open(["3/usual"]);
     await page.press("Escape");
-    await open(["1/1", "3/1", "4/1", "5/1"]);
+    await open(["1/1", "2/1", "3/1", "4/1"]);
     await page.click("[data-layout='2']");
-    await open(["1/1", "3/1", "4/1"]);
     await page.run(() => document.querySelector(".grid")!.scrollTo(0, 1e6));
     await open(["7/1", "8/1", "9/1"]);
     await page.run(() => {
@@ -106,12 +120,41 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.until(() => !document.querySelector("dialog")!.open);
     await page.press("ArrowLeft");
     expect(await page.run(shown)).toBe("Camera <b>2</b>");
-    await page.until(
-      () => document.querySelector(".large .message-sentence")!.textContent === "Live view is not available yet",
-    );
+    await page.until(() => document.querySelector(".large[data-state=live]") !== null);
     await page.press("Escape");
     await page.until(() => document.activeElement?.closest(".tile")?.getAttribute("data-camera") === "2");
     expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
+    await leave(page);
+  }, 40_000);
+
+  test("all kinds of cameras side by side; sound on demand, and the picture in step with it", async () => {
+    const page = await loggedIn([1, 12, 13]);
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 3);
+    await open(["1/1", "12/usual"]);
+    expect(await page.run(() => [...document.querySelectorAll(".hint")].map((hint) => hint.textContent))).toEqual([
+      "",
+      "",
+      "This browser cannot play H.265: still pictures",
+    ]);
+    await page.run(watchSoundAndPicture);
+    await page.click("[data-camera='12'] .tile-open");
+    await page.until(() => / (2[0-9]) fps$/.test(document.querySelector(".large-description")!.textContent!));
+    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
+    expect(await page.run(() => document.body.dataset["sounds"]), "muted at first").toBe("");
+    await page.press("m");
+    await page.until(() => document.body.dataset["sounds"]!.split(" ").length >= 6);
+    expect(await page.run(() => document.querySelector(".sound")!.textContent)).toBe("Sound on");
+    const { sounds, pictures } = (await page.run(() => ({ ...document.body.dataset }))) as Record<string, string>;
+    const seenMs = pictures!.split(" ").map(Number);
+    // Of the first second, in which the picture begins to wait for the sound, nothing is asked.
+    const offsetsMs = sounds!
+      .split(" ")
+      .slice(2)
+      .map((heard) => Math.min(...seenMs.map((seen) => Math.abs(seen - Number(heard)))));
+    expect(Math.max(...offsetsMs.sort((one, other) => one - other).slice(0, -1))).toBeLessThanOrEqual(80);
+    expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
+    await page.press("m");
+    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
     await leave(page);
   }, 40_000);
 
@@ -147,3 +190,40 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await leave(page);
   }, 40_000);
 });
+
+/** Runs in the page: notes in its body when a sound begins to be heard, and when the large picture turns white. */
+function watchSoundAndPicture(): void {
+  const notes = Object.assign(document.body.dataset, { sounds: "", pictures: "" });
+  const note = (what: "sounds" | "pictures", ms: number) => (notes[what] = `${notes[what]} ${ms}`.trim());
+  const connect = AudioNode.prototype.connect as (to: AudioNode) => AudioNode;
+  AudioNode.prototype.connect = function (this: AudioNode, to: AudioNode) {
+    const context = this.context as AudioContext;
+    const ear = context.createAnalyser();
+    const samples = new Float32Array(ear.fftSize);
+    let lastLoud = 0;
+    setInterval(() => {
+      const endTime = context.currentTime;
+      ear.getFloatTimeDomainData(samples);
+      samples.forEach((sample, index) => {
+        const atTime = endTime - (samples.length - index) / context.sampleRate;
+        if (Math.abs(sample) < 0.05 || atTime <= lastLoud) return;
+        const { contextTime, performanceTime } = context.getOutputTimestamp();
+        if (atTime - lastLoud > 0.5) note("sounds", performanceTime! + (atTime - contextTime!) * 1000);
+        lastLoud = atTime;
+      });
+    }, 20);
+    connect.call(this, ear);
+    return connect.call(this, to);
+  } as typeof AudioNode.prototype.connect;
+  const eye = new OffscreenCanvas(1, 1).getContext("2d", { willReadFrequently: true })!;
+  let wasWhite = false;
+  const look = () => {
+    const canvas = document.querySelector<HTMLCanvasElement>(".large canvas");
+    if (canvas) eye.drawImage(canvas, 5, 5, 1, 1, 0, 0, 1, 1);
+    const isWhite = eye.getImageData(0, 0, 1, 1).data[0]! > 128;
+    if (isWhite && !wasWhite) note("pictures", performance.now());
+    wasWhite = isWhite;
+    requestAnimationFrame(look);
+  };
+  look();
+}

@@ -4,7 +4,7 @@
 
 import { arrange } from "../../client/src/ui/layout";
 import { snapshotFileName } from "../../client/src/ui/text";
-import { Server } from "../../client/src/wire/server";
+import { Server, type Camera } from "../../client/src/wire/server";
 
 const json = (status: number, body: unknown) =>
   new Response(JSON.stringify(body), { status, headers: { "Content-Type": "application/json" } });
@@ -12,9 +12,10 @@ const failure = (code: number, message?: string) => ({ success: false, error: { 
 const html = (status: number) => new Response("<h1>nginx</h1>", { status, headers: { "Content-Type": "text/html" } });
 const lost = () => Promise.reject(new TypeError("Failed to fetch"));
 
+const kMjpeg = { id: 1, video_type: 1 } as Camera;
 const cameras = (server: Server) => server.cameras();
 const login = (server: Server) => server.login("admin", "secret");
-const snapshot = (server: Server) => server.snapshot(1);
+const snapshot = (server: Server) => server.snapshot(kMjpeg);
 const live = (server: Server) => server.live(1, 1, new AbortController().signal);
 
 test.each([
@@ -73,7 +74,9 @@ test("a request without an answer ends in time", async () => {
   vi.stubGlobal("fetch", (_address: string, { signal }: RequestInit) => {
     return new Promise((_resolve, reject) => signal!.addEventListener("abort", () => reject(signal!.reason)));
   });
-  const failed = expect(new Server(() => undefined).snapshot(1, undefined, 3000)).rejects.toThrow("does not answer");
+  const failed = expect(new Server(() => undefined).snapshot(kMjpeg, undefined, 3000)).rejects.toThrow(
+    "does not answer",
+  );
   await vi.advanceTimersByTimeAsync(3000);
   await failed;
   vi.useRealTimers();

@@ -19,6 +19,9 @@ const kTypes: Record<string, string> = {
   ".svg": "image/svg+xml",
 };
 const kFrameMs = 50;
+/** 40 ms of sound at 8 kHz, µ-law. */
+const kTone = Array.from({ length: 320 }, (_, sample) => (sample % 8 < 4 ? 0x90 : 0x10));
+const kSilence = Array<number>(320).fill(0xff);
 
 export class FakeServer {
   readonly cameras: { id: number; name: string; video_type: number }[] = [];
@@ -30,6 +33,8 @@ export class FakeServer {
   mostPollsAtOnce = 0;
   hasSession = false;
   jpeg = Buffer.alloc(0);
+  /** What cameras of another video type send, 25 pictures a second, over and over, with a tone beside each `isLoud`. */
+  readonly muxed = new Map<number, { type: string; pictures: Buffer[]; isLoud(picture: number): boolean }>();
   readonly #files = mkdtempSync(join(tmpdir(), "lookhaven-client-"));
   readonly #server = createServer((request, answer) => this.#answer(request, answer));
   #pollsNow = 0;
@@ -61,6 +66,7 @@ export class FakeServer {
     if (method === "Login") this.hasSession = true;
     if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
     if (method === "Logout") this.hasSession = false;
+    if (method === "Get") return this.#snapshot(answer);
     if (method === "Play") return this.#play(searchParams, answer);
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
     const list = {
@@ -87,15 +93,25 @@ export class FakeServer {
   #play(parameters: URLSearchParams, answer: ServerResponse): void {
     const id = Number(parameters.get("camera"));
     if (parameters.get("snapshot") === "1") return this.#snapshot(answer);
+    const muxed = this.muxed.get(id);
+    if (muxed && parameters.has("profileType")) return json(answer, 502, { success: false, error: { code: 502 } });
     const name = `${id}/${parameters.get("profileType") ?? "usual"}`;
     this.streams.push(name);
     answer.writeHead(200, { "Content-Type": "multipart/x-mixed-replace; boundary=b" }).write("--b\r\n");
+    const startMs = Date.now();
+    let sent = 0;
     const timer = setInterval(() => {
       // A stream of an ended session ends, as the host has it.
       if (!this.hasSession) return void answer.end();
       if (this.stalled.has(id)) return;
-      const head = `Content-Length: ${this.jpeg.length}\r\nX-Capture-Time: ${Date.now() / 1000}\r\nX-Age-Ms: 1\r\n\r\n`;
-      answer.write(Buffer.concat([Buffer.from(head), this.jpeg, Buffer.from("\r\n--b\r\n")]));
+      for (; muxed && sent * 40 <= Date.now() - startMs; sent += 1) {
+        const at = `X-Timestamp: ${(startMs + sent * 40) * 1000}\r\nX-Codecs: ${muxed.type};PCMU\r\n`;
+        const sound = Buffer.from(muxed.isLoud(sent) ? kTone : kSilence);
+        answer.write(part(`Content-Type: image/${muxed.type}\r\n${at}`, muxed.pictures[sent % muxed.pictures.length]!));
+        answer.write(part(`Content-Type: audio/PCMU\r\n${at}`, sound));
+      }
+      if (muxed) return;
+      answer.write(part(`X-Capture-Time: ${Date.now() / 1000}\r\nX-Age-Ms: 1\r\n`, this.jpeg));
     }, kFrameMs);
     answer.on("close", () => {
       clearInterval(timer);
@@ -112,6 +128,14 @@ export class FakeServer {
       answer.writeHead(200, { "Content-Type": "image/jpeg" }).end(this.jpeg);
     }, kFrameMs);
   }
+}
+
+function part(head: string, body: Buffer): Buffer {
+  return Buffer.concat([
+    Buffer.from(`${head}Content-Length: ${body.length}\r\n\r\n`),
+    body,
+    Buffer.from("\r\n--b\r\n"),
+  ]);
 }
 
 function json(answer: ServerResponse, status: number, body: unknown): void {

@@ -3,11 +3,12 @@
 // What keeps a picture live: the verdict on the signal, reconnecting, the sharing of connections, the sources.
 
 import { Backoff } from "../../client/src/live/backoff";
-import { captureOf, MjpegSource, NewestPicture } from "../../client/src/live/mjpeg_source";
+import { captureOf } from "../../client/src/live/media_part";
 import { SignalJudge } from "../../client/src/live/signal_state";
 import { chooseStreams, streamLimit } from "../../client/src/live/stream_budget";
+import { NewestPicture, StreamSource } from "../../client/src/live/stream_source";
 import { Turns } from "../../client/src/live/turns";
-import { ServerError, type Server } from "../../client/src/wire/server";
+import { ServerError, type Camera, type Server } from "../../client/src/wire/server";
 
 const kWallStartMs = 1_764_000_000_000;
 
@@ -207,8 +208,10 @@ test.each([
   ["nor without a session", [], 401, [1, 1]],
 ])("profiles of a small tile, run twice: %s", async (_name, working, status, asked) => {
   vi.stubGlobal("createImageBitmap", async () => ({ close: () => undefined }));
+  vi.stubGlobal("cancelAnimationFrame", () => undefined);
   const fake = serverWith(working, status);
-  const source = new MjpegSource(fake.server, 1, true);
+  const stills = { everyMs: 0, lostAfterMs: 0, run: async () => undefined };
+  const source = new StreamSource(fake.server, { id: 1, video_type: 1 } as Camera, true, stills);
   for (let run = 0; run < 2; run += 1) {
     const failed = await source
       .run(() => undefined, new AbortController().signal)

@@ -13,6 +13,7 @@ export class Feed {
   readonly #judge = new SignalJudge();
   #source: LiveSource | null = null;
   #run: AbortController | null = null;
+  #failure: ServerError | null = null;
 
   /** `show` draws and closes a frame; `changed` is told when the state may have changed by something other than time. */
   constructor(show: (frame: Frame) => void, changed: () => void) {
@@ -23,6 +24,11 @@ export class Feed {
   /** Null while stopped. */
   get source(): LiveSource | null {
     return this.#source;
+  }
+
+  /** What the last attempt failed with, until a picture comes. */
+  get failure(): ServerError | null {
+    return this.#failure;
   }
 
   /** Changes with time too: ask again about twice a second. */
@@ -36,7 +42,7 @@ export class Feed {
     this.#run?.abort();
     this.#run = new AbortController();
     this.#source = source;
-    this.#judge.begin(source.lostAfterMs);
+    this.#failure = null;
     void this.#keepRunning(source, this.#run.signal);
     this.#changed();
   }
@@ -54,19 +60,23 @@ export class Feed {
     const show = (frame: Frame) => {
       const before = this.#judge.state().kind;
       backoff.reset();
+      this.#failure = null;
       this.#judge.picture(frame.capturedMs, frame.ageMs);
       this.#show(frame);
       if (this.#judge.state().kind !== before) this.#changed();
     };
     while (!signal.aborted) {
-      let reason = "";
+      // Sources may go over to another way of getting pictures from one attempt to the next.
+      this.#judge.begin(source.lostAfterMs);
+      let failure: ServerError | null = null;
       try {
         await source.run(show, signal);
       } catch (error) {
-        reason = error instanceof ServerError ? error.message : "The picture cannot be shown.";
+        failure = error instanceof ServerError ? error : new ServerError(0, 0, "The picture cannot be shown.");
       }
       if (signal.aborted) return;
-      this.#judge.broke(reason);
+      this.#failure = failure;
+      this.#judge.broke(failure?.message ?? "");
       this.#changed();
       await pause(backoff.next(), signal);
     }

@@ -2,7 +2,7 @@
 //
 // Live pictures of a camera by asking for a snapshot again and again: for tiles that get no stream of their own.
 
-import type { Server } from "../wire/server";
+import type { Camera, Server } from "../wire/server";
 import { pause, type Frame, type LiveSource } from "./source";
 import type { Turns } from "./turns";
 
@@ -13,13 +13,13 @@ export class SnapshotSource implements LiveSource {
   readonly lostAfterMs = 10_000;
   readonly everyMs = 2_000;
   readonly #server: Server;
-  readonly #cameraId: number;
+  readonly #camera: Camera;
   readonly #turns: Turns;
 
   /** `turns` is shared by all that poll the same server. */
-  constructor(server: Server, cameraId: number, turns: Turns) {
+  constructor(server: Server, camera: Camera, turns: Turns) {
     this.#server = server;
-    this.#cameraId = cameraId;
+    this.#camera = camera;
     this.#turns = turns;
   }
 
@@ -27,7 +27,7 @@ export class SnapshotSource implements LiveSource {
     while (!signal.aborted) {
       try {
         const snapshot = await this.#turns.run(signal, () =>
-          this.#server.snapshot(this.#cameraId, signal, kAnswerLimitMs),
+          this.#server.snapshot(this.#camera, signal, kAnswerLimitMs),
         );
         const image = await createImageBitmap(snapshot.jpeg);
         if (signal.aborted) return image.close();

@@ -10,7 +10,6 @@ import { Turns } from "../live/turns";
 import type { Camera, Server } from "../wire/server";
 import { element } from "./dom";
 import { arrange, type LayoutChoice } from "./layout";
-import { canShow } from "./picture";
 import { Tile, type TileActions, type TileMode } from "./tile";
 
 /** Scrolling past a tile must not open and close a stream. */
@@ -46,6 +45,8 @@ export class Grid {
   #layout: LayoutChoice = "auto";
   #columns = 1;
   #tilePx = 0;
+  /** Tiles that would have no use for a stream, as text to compare. */
+  #blocked = "";
 
   constructor(server: Server, actions: TileActions) {
     this.#server = server;
@@ -98,6 +99,9 @@ export class Grid {
   /** How many of the tiles on the screen have lost their signal. Also brings all tiles up to date with the clock. */
   refresh(): number {
     let lost = 0;
+    const blocked = this.#inOrder().flatMap((tile) => (tile.obstacle ? tile.camera.id : []));
+    if (blocked.join() !== this.#blocked) this.#assignSoon();
+    this.#blocked = blocked.join();
     for (const tile of this.#tiles.values()) {
       tile.picture.refresh();
       if (tile.picture.state().kind === "lost") lost += 1;
@@ -133,7 +137,7 @@ export class Grid {
 
   #assign(): void {
     const shown = document.hidden ? [] : this.#inOrder().filter((tile) => this.#visible.has(tile.camera.id));
-    const playable = shown.filter((tile) => canShow(tile.camera)).map((tile) => tile.camera.id);
+    const playable = shown.filter((tile) => !tile.obstacle).map((tile) => tile.camera.id);
     const streaming = new Set(this.#inOrder().flatMap((tile) => (tile.streams ? [tile.camera.id] : [])));
     const chosen = chooseStreams(playable, streaming, this.#limit);
     const stream: TileMode = this.#tilePx * devicePixelRatio > kSmallPictureLimitPx ? "stream-full" : "stream-small";

@@ -2,11 +2,16 @@
 //
 // One camera over the whole window, at the camera's full picture.
 
-import { MjpegSource } from "../live/mjpeg_source";
+import { SnapshotSource } from "../live/snapshot_source";
+import { Sound } from "../live/sound";
+import { StreamSource } from "../live/stream_source";
+import { Turns } from "../live/turns";
 import type { Camera, Server } from "../wire/server";
 import { iconButton } from "./button";
+import { icon } from "./icons";
 import { element, setText } from "./dom";
-import { canShow, Picture } from "./picture";
+import { notify } from "./notice";
+import { Picture } from "./picture";
 import { sentenceOf } from "./text";
 
 export interface LargeViewActions {
@@ -21,7 +26,10 @@ export class LargeView {
   readonly root: HTMLElement;
   readonly camera: Camera;
   readonly #picture: Picture;
-  readonly #source: MjpegSource;
+  readonly #source: StreamSource;
+  readonly #sound = new Sound(() => this.#showSound());
+  readonly #soundButton = element("button", { type: "button", class: "icon-button sound", hidden: true });
+  readonly #soundWord = element("span");
   readonly #state = element("span", { class: "large-state" });
   readonly #description = element("span", { class: "large-description" });
   readonly #back: HTMLButtonElement;
@@ -30,14 +38,27 @@ export class LargeView {
   /** `still` is what the wall shows of this camera, as a first picture until the large one comes. */
   constructor(camera: Camera, server: Server, actions: LargeViewActions, still?: Picture) {
     this.camera = camera;
-    this.#source = new MjpegSource(server, camera.id, false);
-    this.#picture = new Picture(camera, () => this.#showState());
+    this.#source = new StreamSource(
+      server,
+      camera,
+      false,
+      new SnapshotSource(server, camera, new Turns(1)),
+      this.#sound,
+    );
+    this.#picture = new Picture(
+      () => this.#source.obstacle,
+      () => this.#showState(),
+      true,
+    );
     if (still?.hasPicture) this.#picture.showStill(still.canvas);
     this.#back = iconButton("back", "Back to all cameras", () => actions.back(), "Esc");
+    this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundWord);
+    this.#soundButton.addEventListener("click", () => this.toggleSound());
     const buttons = [
+      this.#soundButton,
       iconButton("previous", "Previous camera", () => actions.step(-1), "←"),
       iconButton("next", "Next camera", () => actions.step(1), "→"),
-      ...(canShow(camera) ? [iconButton("snapshot", "Snapshot", () => actions.snapshot(), "S")] : []),
+      iconButton("snapshot", "Snapshot", () => actions.snapshot(), "S"),
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
     ];
     const bar = element(
@@ -69,11 +90,18 @@ export class LargeView {
   close(): void {
     document.removeEventListener("visibilitychange", this.#follow);
     this.#picture.feed.stop();
+    this.#sound.switchOff();
     this.root.remove();
   }
 
+  /** Call it while the user clicks or presses a key. */
+  toggleSound(): void {
+    if (this.#sound.trouble) notify(`${this.#sound.trouble}.`);
+    if (this.#sound.isOn) this.#sound.switchOff();
+    else void this.#sound.switchOn();
+  }
+
   #playIfSeen(): void {
-    if (!canShow(this.camera)) return;
     if (document.hidden) this.#picture.feed.stop();
     else this.#picture.feed.play(this.#source);
   }
@@ -81,7 +109,18 @@ export class LargeView {
   #showState(): void {
     const state = this.#picture.state();
     this.root.dataset["state"] = state.kind;
-    setText(this.#state, state.kind === "unavailable" ? "not available yet" : sentenceOf(state));
+    const everyMs = this.#picture.feed.source?.everyMs;
+    setText(this.#state, state.kind === "unavailable" ? "not available" : sentenceOf(state, everyMs));
     setText(this.#description, this.#picture.description());
+    if (this.#source.obstacle && this.#sound.isOn) this.#sound.switchOff();
+    this.#showSound();
+  }
+
+  #showSound(): void {
+    const { exists, isOn, trouble } = this.#sound;
+    this.#soundButton.hidden = !exists || this.#source.obstacle !== null;
+    this.#soundButton.setAttribute("aria-pressed", String(isOn));
+    this.#soundButton.title = trouble || `Turn the sound ${isOn ? "off" : "on"} (M)`;
+    setText(this.#soundWord, trouble ? "No sound" : isOn ? "Sound on" : "Sound off");
   }
 }

@@ -3,34 +3,41 @@
 // One camera's picture with the message that lies over it while it is not live; used by the tiles and the large view.
 
 import { Feed } from "../live/feed";
+import type { Obstacle } from "../live/obstacle";
 import type { SignalState } from "../live/signal_state";
-import { kVideoTypeMjpeg, type Camera } from "../wire/server";
+import { adviceOn } from "./advice";
 import { draw, element, setText } from "./dom";
 import { icon } from "./icons";
 import { sentenceOf } from "./text";
 
-export type PictureState = SignalState | { kind: "unavailable" };
+/** Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. */
+export type PictureState = SignalState | { kind: "unavailable"; reason: string };
 
-/** Whether this client can show the camera's live view and take snapshots of it. */
-export function canShow(camera: Camera): boolean {
-  return camera.video_type === kVideoTypeMjpeg;
-}
+/** An answer of the server that will not change by asking again. */
+const kNoSuchApi = 404;
 
 export class Picture {
   readonly canvas = element("canvas", { "aria-hidden": "true" });
   readonly feed: Feed;
   readonly root: HTMLElement;
-  readonly #camera: Camera;
+  readonly #obstacle: () => Obstacle | null;
   readonly #changed: () => void;
+  readonly #canLink: boolean;
   readonly #sentence = element("p", { class: "message-sentence" });
   readonly #reason = element("p", { class: "message-reason" });
+  readonly #hint = element("p", { class: "hint", role: "note" });
+  #hinted: Obstacle | null = null;
   #frames = 0;
   #rateSinceMs = performance.now();
   #framesPerSecond = 0;
 
-  /** `changed` is called after the state on the screen changed; call `refresh` once when you are ready for it. */
-  constructor(camera: Camera, changed: () => void) {
-    this.#camera = camera;
+  /**
+   * `obstacle` says why still pictures are shown; `changed` is called after the state on the screen changed: call
+   * `refresh` once when you are ready for it. Links are shown where `canLink`, which is not so within a button.
+   */
+  constructor(obstacle: () => Obstacle | null, changed: () => void, canLink: boolean) {
+    this.#obstacle = obstacle;
+    this.#canLink = canLink;
     this.#changed = changed;
     this.feed = new Feed(
       ({ image }) => {
@@ -44,15 +51,19 @@ export class Picture {
       "div",
       { class: "message" },
       element("div", { class: "spinner" }),
-      icon(canShow(camera) ? "noSignal" : "camera"),
+      icon("noSignal"),
       this.#sentence,
       this.#reason,
     );
-    this.root = element("div", { class: "picture" }, this.canvas, message);
+    this.root = element("div", { class: "picture" }, this.canvas, message, this.#hint);
   }
 
   state(): PictureState {
-    return canShow(this.#camera) ? this.feed.state() : { kind: "unavailable" };
+    const state = this.feed.state();
+    const obstacle = this.#obstacle();
+    const isShown = state.kind === "live" || state.kind === "idle";
+    if (!obstacle || isShown || this.feed.failure?.status !== kNoSuchApi) return state;
+    return { kind: "unavailable", reason: obstacle.reason };
   }
 
   get hasPicture(): boolean {
@@ -74,19 +85,30 @@ export class Picture {
       this.#frames = 0;
       this.#rateSinceMs = nowMs;
     }
-    if (this.state().kind !== "live" || this.#framesPerSecond === 0) return "";
+    const isStream = this.feed.source?.everyMs === 0;
+    if (this.state().kind !== "live" || !isStream || this.#framesPerSecond === 0) return "";
     return `${this.canvas.width} × ${this.canvas.height} · ${this.#framesPerSecond} fps`;
   }
 
   /** Brings the screen up to date with the clock. */
   refresh(): void {
     const state = this.state();
-    const sentence = state.kind === "unavailable" ? "live view is not available yet" : sentenceOf(state);
+    const sentence = state.kind === "unavailable" ? state.reason : sentenceOf(state);
     setText(this.#sentence, sentence.charAt(0).toUpperCase() + sentence.slice(1));
-    setText(this.#reason, state.kind === "lost" ? state.reason : "");
+    const noStills = "The server has no still pictures of this camera.";
+    setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
+    this.#showHint(state.kind === "unavailable" ? null : this.#obstacle());
     if (this.root.dataset["state"] !== state.kind) {
       this.root.dataset["state"] = state.kind;
       this.#changed();
     }
+  }
+
+  #showHint(obstacle: Obstacle | null): void {
+    if (this.#hinted === obstacle) return;
+    this.#hinted = obstacle;
+    // What can be remedied, the wall says once for all its tiles.
+    const isSaidHere = obstacle && (this.#canLink || !obstacle.remedy);
+    this.#hint.replaceChildren(...(isSaidHere ? adviceOn(obstacle) : []));
   }
 }

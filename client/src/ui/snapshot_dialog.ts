@@ -37,7 +37,7 @@ export class SnapshotDialog {
     this.#fill(camera, "", waiting);
     if (!this.root.open) this.root.showModal();
     try {
-      const snapshot = await this.#server.snapshot(camera.id, request.signal);
+      const snapshot = await this.#server.snapshot(camera, request.signal);
       const image = await createImageBitmap(snapshot.jpeg);
       if (!request.signal.aborted) this.#show(camera, snapshot, image);
       image.close();

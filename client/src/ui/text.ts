@@ -28,14 +28,15 @@ export function snapshotFileName(cameraName: string, takenMs: number): string {
   return `${name}_${calendarDate(takenMs)}_${clockTime(takenMs).replaceAll(":", "-")}.jpg`;
 }
 
-export function sentenceOf(state: SignalState): string {
+/** `everyMs` is the time between two pictures of a source that polls. */
+export function sentenceOf(state: SignalState, everyMs = 0): string {
   switch (state.kind) {
     case "idle":
       return "paused";
     case "connecting":
       return "connecting";
     case "live":
-      return "live";
+      return everyMs > 0 ? `live, every ${everyMs / 1000} s` : "live";
     case "lost":
       return `no signal since ${clockTime(state.sinceMs)}`;
   }

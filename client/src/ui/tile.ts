@@ -2,14 +2,15 @@
 //
 // One camera on the wall: its picture, and below it a bar with state, name and snapshot button.
 
-import { MjpegSource } from "../live/mjpeg_source";
+import type { Obstacle } from "../live/obstacle";
 import { SnapshotSource } from "../live/snapshot_source";
-import type { LiveSource } from "../live/source";
+import { StreamSource } from "../live/stream_source";
 import type { Turns } from "../live/turns";
 import type { Camera, Server } from "../wire/server";
 import { iconButton } from "./button";
 import { element, setText } from "./dom";
-import { canShow, Picture, type PictureState } from "./picture";
+import { Picture, type PictureState } from "./picture";
+import { sentenceOf } from "./text";
 
 /** How a tile gets its pictures. */
 export type TileMode = "off" | "poll" | "stream-small" | "stream-full";
@@ -25,17 +26,22 @@ export class Tile {
   readonly picture: Picture;
   readonly #open: HTMLButtonElement;
   readonly #state = element("span", { class: "tile-state" });
-  readonly #sources: Record<Exclude<TileMode, "off">, LiveSource>;
+  readonly #stills: SnapshotSource;
+  readonly #streams: Record<Exclude<TileMode, "off" | "poll">, StreamSource>;
 
   constructor(camera: Camera, server: Server, turns: Turns, actions: TileActions) {
     this.camera = camera;
-    this.#sources = {
-      poll: new SnapshotSource(server, camera.id, turns),
-      "stream-small": new MjpegSource(server, camera.id, true),
-      "stream-full": new MjpegSource(server, camera.id, false),
+    this.#stills = new SnapshotSource(server, camera, turns);
+    this.#streams = {
+      "stream-small": new StreamSource(server, camera, true, this.#stills),
+      "stream-full": new StreamSource(server, camera, false, this.#stills),
     };
     this.#open = element("button", { type: "button", class: "tile-open" });
-    this.picture = new Picture(camera, () => this.#showState());
+    this.picture = new Picture(
+      () => this.obstacle,
+      () => this.#showState(),
+      false,
+    );
     this.#open.append(this.picture.root);
     this.#open.addEventListener("click", () => actions.open(camera));
     const bar = element(
@@ -44,18 +50,21 @@ export class Tile {
       element("span", { class: "dot" }),
       element("span", { class: "tile-name", title: camera.name }, camera.name),
       this.#state,
+      iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
     );
-    if (canShow(camera)) {
-      bar.append(iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"));
-    }
     this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, this.#open, bar);
     this.picture.refresh();
   }
 
   set mode(mode: TileMode) {
-    if (mode === "off" || !canShow(this.camera)) this.picture.feed.stop();
-    else this.picture.feed.play(this.#sources[mode]);
+    if (mode === "off") this.picture.feed.stop();
+    else this.picture.feed.play(mode === "poll" ? this.#stills : this.#streams[mode]);
     this.#showState();
+  }
+
+  /** Why a stream would be of no use to the tile; null when it has one, or would like one. */
+  get obstacle(): Obstacle | null {
+    return this.#streams["stream-small"].obstacle ?? this.#streams["stream-full"].obstacle;
   }
 
   get streams(): boolean {
@@ -76,18 +85,16 @@ export class Tile {
 
   /** Short, since the picture itself carries the whole sentence. */
   #wordFor(state: PictureState): string {
-    const everyMs = this.picture.feed.source?.everyMs ?? 0;
     switch (state.kind) {
       case "unavailable":
-        return "not available yet";
+        return "not available";
       case "lost":
         return "no signal";
       case "live":
-        return everyMs > 0 ? `live, every ${everyMs / 1000} s` : "live";
+      case "connecting":
+        return sentenceOf(state, this.picture.feed.source?.everyMs);
       case "idle":
         return "";
-      case "connecting":
-        return "connecting";
     }
   }
 }

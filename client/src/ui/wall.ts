@@ -2,7 +2,9 @@
 //
 // What a logged-in user sees: the bar, the grid of all cameras, and over it the large view of one.
 
-import { ServerError, type Account, type Camera, type CameraList, type Server } from "../wire/server";
+import { missingDecoder } from "../live/obstacle";
+import { kVideoTypeMjpeg, ServerError, type Account, type Camera, type CameraList, type Server } from "../wire/server";
+import { adviceOn } from "./advice";
 import { iconButton } from "./button";
 import { element, setText } from "./dom";
 import { Grid } from "./grid";
@@ -10,7 +12,6 @@ import { icon, type IconName } from "./icons";
 import { LargeView, type LargeViewActions } from "./large_view";
 import { kLayoutChoices, type LayoutChoice } from "./layout";
 import { notify } from "./notice";
-import { canShow } from "./picture";
 import { openCamera, showCamera, showWall } from "./route";
 import { SnapshotDialog } from "./snapshot_dialog";
 import { clockTime } from "./text";
@@ -37,6 +38,7 @@ export class Wall {
   readonly #clock = element("time", { class: "wall-clock" });
   readonly #progress = element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" });
   readonly #message = element("div", { class: "wall-message" });
+  readonly #advice = element("p", { class: "wall-advice", role: "note", hidden: true });
   readonly #front: HTMLElement;
   readonly #onRoute = () => this.#followRoute();
   readonly #onKey = (event: KeyboardEvent) => this.#key(event);
@@ -56,7 +58,15 @@ export class Wall {
       open: (camera) => showCamera(camera.id),
       snapshot: (camera) => this.#snapshot(camera),
     });
-    this.#front = element("div", { class: "wall" }, this.#bar(account), this.#progress, this.#message, this.#grid.root);
+    this.#front = element(
+      "div",
+      { class: "wall" },
+      this.#bar(account),
+      this.#progress,
+      this.#advice,
+      this.#message,
+      this.#grid.root,
+    );
     this.root = element("main", { class: "screen" }, this.#front, this.#dialog.root);
     addEventListener("popstate", this.#onRoute);
     document.addEventListener("keydown", this.#onKey);
@@ -121,7 +131,15 @@ export class Wall {
     else if (list.isManager)
       this.#showMessage("camera", "No camera yet. “lookhaven camera add” on the server adds one.", false);
     else this.#showMessage("camera", "There is no camera for you to see yet.", false);
+    this.#showAdvice(this.#cameras.some(({ video_type }) => video_type !== kVideoTypeMjpeg));
     this.#followRoute();
+  }
+
+  /** Where the page came over plain HTTP, it can do less than over HTTPS. */
+  #showAdvice(needsDecoder: boolean): void {
+    const missing = needsDecoder ? missingDecoder() : null;
+    this.#advice.hidden = !missing;
+    if (missing && !this.#advice.hasChildNodes()) this.#advice.append(...adviceOn(missing));
   }
 
   #showMessage(name: IconName, sentence: string, canRetry: boolean): void {
@@ -179,8 +197,7 @@ export class Wall {
   }
 
   #snapshot(camera: Camera): void {
-    if (canShow(camera)) void this.#dialog.take(camera);
-    else notify(`Snapshots of ${camera.name} are not available yet.`);
+    void this.#dialog.take(camera);
   }
 
   #key(event: KeyboardEvent): void {
@@ -193,6 +210,7 @@ export class Wall {
     else if (key === "arrowleft" || key === "arrowup") this.#step(-1);
     else if (key === "arrowright" || key === "arrowdown") this.#step(1);
     else if (key === "f") toggleFullScreen();
+    else if (key === "m") this.#large.toggleSound();
     else return;
     event.preventDefault();
   }

@@ -123,10 +123,15 @@ export class Server {
   }
 
   /** One picture in the camera's usual size. */
-  async snapshot(cameraId: number, owner?: AbortSignal, limitMs = kAnswerLimitMs): Promise<Snapshot> {
+  async snapshot(camera: Camera, owner?: AbortSignal, limitMs = kAnswerLimitMs): Promise<Snapshot> {
     const deadline = new Deadline(limitMs, owner);
+    const parameters = { camera: String(camera.id) };
     try {
-      const answer = await this.#play({ camera: String(cameraId), snapshot: "1" }, deadline.signal);
+      // What the camera sends is a picture already, or has to be made into one by the host.
+      const answer =
+        camera.video_type === kVideoTypeMjpeg
+          ? await this.#media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", { ...parameters, snapshot: "1" }, deadline)
+          : await this.#media("VEXO.Picture", "Get", parameters, deadline);
       const captured = Number(answer.headers.get("X-Capture-Time"));
       return { jpeg: await answer.blob(), takenMs: captured > 0 ? captured * 1000 : Date.now() };
     } catch (error) {
@@ -142,14 +147,19 @@ export class Server {
   async live(cameraId: number, profile: number | null, signal: AbortSignal): Promise<Response> {
     const parameters: Record<string, string> = { camera: String(cameraId) };
     if (profile !== null) parameters["profileType"] = String(profile);
-    return this.#play(parameters, signal).catch((error: unknown) => {
+    return this.#media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters, { signal }).catch((error: unknown) => {
       throw asServerError(error);
     });
   }
 
   /** An answer of pictures; a JSON answer in their place, whatever its status, is a failure. */
-  async #play(parameters: Record<string, string>, signal: AbortSignal): Promise<Response> {
-    const answer = await fetch(address("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters), { signal });
+  async #media(
+    api: string,
+    method: string,
+    parameters: Record<string, string>,
+    { signal }: { signal: AbortSignal },
+  ): Promise<Response> {
+    const answer = await fetch(address(api, method, parameters), { signal });
     if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
     if (answer.status === 401) this.#onSessionEnd();
     const failure = await failureOf(answer);

@@ -1,0 +1,173 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Live pictures of a camera out of one endless multipart answer: JPEG pictures, or compressed picture and sound.
+//
+// Why so        An image element would show JPEG streams with less code, but tells neither when a picture was captured nor
+//               that the stream has ended. Here each part is known, and a JPEG picture that comes while another is being
+//               decoded takes the place of any that waits: a slow viewer sees fewer pictures, never older ones.
+//
+//               A stream that cannot be played here is closed, and still pictures are asked for in its place for a while.
+
+import { Deadline } from "../wire/deadline";
+import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
+import { kVideoTypeMjpeg, ServerError, type Camera, type Server } from "../wire/server";
+import { captureOf, mediaOf } from "./media_part";
+import { missingDecoder, type Obstacle } from "./obstacle";
+import type { Sound } from "./sound";
+import type { Frame, LiveSource } from "./source";
+import { VideoPlayer } from "./video_player";
+
+/** The small picture of cameras that have one. */
+const kSmallProfile = 1;
+/** Longer than the server takes to find out that a camera is silent. */
+const kSilenceLimitMs = 25_000;
+/** No answer, no session, too busy: failures that another profile would meet as well. */
+const kNotTheProfile = [0, 401, 503];
+/** A timer's longest. */
+const kForeverMs = 2 ** 31 - 1;
+
+/** Decodes one picture at a time, and of those that come meanwhile the newest only. */
+export class NewestPicture {
+  #waiting: Part | null = null;
+  #busy = false;
+  readonly #show: (part: Part) => Promise<void>;
+
+  constructor(show: (part: Part) => Promise<void>) {
+    this.#show = show;
+  }
+
+  offer(part: Part): void {
+    this.#waiting = part;
+    if (!this.#busy) void this.#drain();
+  }
+
+  async #drain(): Promise<void> {
+    this.#busy = true;
+    while (this.#waiting) {
+      const part = this.#waiting;
+      this.#waiting = null;
+      // A picture that cannot be decoded is left out; if none can, the signal is lost by the clock.
+      await this.#show(part).catch(() => undefined);
+    }
+    this.#busy = false;
+  }
+}
+
+export class StreamSource implements LiveSource {
+  readonly #server: Server;
+  readonly #camera: Camera;
+  readonly #small: boolean;
+  readonly #stills: LiveSource;
+  readonly #sound: Sound | null;
+  #smallWorks = true;
+  #obstacle: Obstacle | null;
+  #obstacleEndsMs = 0;
+
+  /** `small` asks for the small picture, if the camera has one; `stills` stands in for a stream that cannot be played. */
+  constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, sound: Sound | null = null) {
+    this.#server = server;
+    this.#camera = camera;
+    this.#small = small;
+    this.#stills = stills;
+    this.#sound = sound;
+    this.#obstacle = null;
+    const missing = camera.video_type === kVideoTypeMjpeg ? null : missingDecoder();
+    if (missing) this.#meet(missing);
+  }
+
+  /** Why still pictures are shown, or null while the stream is worth a try. */
+  get obstacle(): Obstacle | null {
+    return performance.now() < this.#obstacleEndsMs ? this.#obstacle : null;
+  }
+
+  get lostAfterMs(): number {
+    return this.obstacle ? this.#stills.lostAfterMs : 5_000;
+  }
+
+  get everyMs(): number {
+    return this.obstacle ? this.#stills.everyMs : 0;
+  }
+
+  async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
+    if (!this.obstacle) return this.#play(show, signal);
+    const untilRetry = new Deadline(Math.min(this.#obstacleEndsMs - performance.now(), kForeverMs), signal);
+    try {
+      await this.#stills.run(show, untilRetry.signal);
+    } finally {
+      untilRetry.release();
+    }
+  }
+
+  #meet(obstacle: Obstacle): void {
+    this.#obstacle = obstacle;
+    this.#obstacleEndsMs = performance.now() + obstacle.retryMs;
+  }
+
+  async #play(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
+    const trySmall = this.#small && this.#smallWorks;
+    let pictures = 0;
+    const count = () => (pictures += 1);
+    if (trySmall) {
+      const failure = await this.#stream(kSmallProfile, show, count, signal).catch((error: ServerError) => error);
+      const hopeless = failure instanceof ServerError && kNotTheProfile.includes(failure.status);
+      if (pictures > 0 || signal.aborted || hopeless) {
+        if (failure instanceof ServerError) throw failure;
+        return;
+      }
+    }
+    try {
+      await this.#stream(null, show, count, signal);
+    } finally {
+      // The usual picture came where the small one did not: ask for it first from now on.
+      if (trySmall && pictures > 0) this.#smallWorks = false;
+    }
+  }
+
+  async #stream(profile: number | null, show: (frame: Frame) => void, count: () => void, owner: AbortSignal) {
+    const deadline = new Deadline(kSilenceLimitMs, owner);
+    const pictures = new NewestPicture(async (part) => {
+      const capture = captureOf(part.headers, Date.now());
+      const image = await createImageBitmap(new Blob([part.body], { type: "image/jpeg" }));
+      if (deadline.signal.aborted) return image.close();
+      show({ image, ...capture });
+    });
+    const giveUp = (obstacle: Obstacle) => {
+      this.#meet(obstacle);
+      deadline.release();
+    };
+    const video = new VideoPlayer(show, giveUp, this.#sound);
+    try {
+      const answer = await this.#server.live(this.#camera.id, profile, deadline.signal);
+      const boundary = boundaryOf(answer.headers.get("Content-Type"));
+      if (!answer.body || boundary === null) throw new ServerError(502, 0, "The server sent no pictures.");
+      const parser = new MultipartParser(boundary, (part) => {
+        if (deadline.signal.aborted) return;
+        deadline.extend();
+        if (part.body.length === 0) return;
+        count();
+        this.#deliver(part, pictures, video);
+      });
+      const reader = answer.body.getReader();
+      for (let read = await reader.read(); !read.done; read = await reader.read()) parser.push(read.value);
+    } catch (error) {
+      if (owner.aborted || this.obstacle) return;
+      throw streamError(error);
+    } finally {
+      video.close();
+      deadline.release();
+    }
+  }
+
+  #deliver(part: Part, pictures: NewestPicture, video: VideoPlayer): void {
+    const media = mediaOf(part);
+    if (media?.kind === "jpeg") pictures.offer(part);
+    else if (media?.kind === "sound") this.#sound?.take(media, part.body);
+    else if (media) video.take(media.codec, media.timestampUs, part.body, captureOf(part.headers, Date.now()));
+  }
+}
+
+function streamError(error: unknown): ServerError {
+  if (error instanceof ServerError) return error;
+  if (error instanceof MultipartError) return new ServerError(502, 0, "The stream is damaged.");
+  return new ServerError(0, 0, "The connection was lost.");
+}
