@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cstdint>
 #include <map>
 
 #include "standalone/cli/commands.h"
@@ -46,6 +47,12 @@ void AssignIfGiven(T& target, const std::optional<T>& given) {
     target = given.value_or(target);
 }
 
+// A flag and its opposite. Bound to the optional itself, the library would fill it with false when neither is given.
+void AddSwitch(CLI::App& command, const char* names, std::optional<bool>& value, const char* meaning) {
+    command.add_flag_function(
+        names, [&value](std::int64_t count) { value = count > 0; }, meaning);
+}
+
 }  // namespace
 
 void CameraOptions::AddTo(CLI::App& command) {
@@ -53,9 +60,9 @@ void CameraOptions::AddTo(CLI::App& command) {
     Choose(command.add_option("--type", type_, "How the video is coded (else found out)"), kTypes);
     Choose(command.add_option("--live", live_profile_, "The profile that the live view shows (high at first)"),
            kProfiles);
-    command.add_flag("--enable,!--disable", enabled_, "Whether it is shown and recorded");
-    command.add_flag("--ptz,!--no-ptz", ptz_, "Whether it moves");
-    command.add_flag("--audio,!--no-audio", audio_, "Whether it hears");
+    AddSwitch(command, "--enable,!--disable", enabled_, "Whether it is shown and recorded");
+    AddSwitch(command, "--ptz,!--no-ptz", ptz_, "Whether it moves");
+    AddSwitch(command, "--audio,!--no-audio", audio_, "Whether it hears");
     for (const auto& [name, number] : kProfiles) {
         ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";
