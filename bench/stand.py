@@ -80,7 +80,11 @@ class Stand:
         self._processes = {}
         self.http_port = free_port()
         self.socket = str(self._home / "run" / "webapi.sock")
-        self._run("init", "--account", "admin", stdin=PASSWORD + "\n")
+        try:
+            self._run("init", "--admin", "admin", stdin=PASSWORD + "\n")
+        except BaseException:
+            shutil.rmtree(self._home)
+            raise
 
     def __enter__(self):
         return self
@@ -103,7 +107,7 @@ class Stand:
         self._processes[name] = subprocess.Popen(command, stdout=log, stderr=log, env=self._environment)
 
     def add_camera(self, name, source):
-        self._run("camera", "add", "--name", name, "--source", source)
+        self._run("camera", "add", "--name", name, "--type", "mjpeg", "--source", source)
 
     def start_feeder(self, camera, frame_bytes, frames_per_second):
         self._start(
