@@ -9,6 +9,7 @@ import { JitterBuffer } from "../../client/src/live/jitter_buffer";
 import { soundConfig } from "../../client/src/live/media_part";
 import type { LiveSource } from "../../client/src/live/source";
 import { StreamSource } from "../../client/src/live/stream_source";
+import { VideoPlayer } from "../../client/src/live/video_player";
 import type { Camera, Server } from "../../client/src/wire/server";
 
 const bytes = (hex: string) => Uint8Array.from(Buffer.from(hex.replaceAll(" ", ""), "hex"));
@@ -133,29 +134,39 @@ test.each<[string, pushed: number[], heardMs: number | null, shown: number | nul
   const gone: number[] = [];
   const queue = new PictureQueue(() => undefined);
   for (const ms of pushed) queue.push({ timestamp: ms * 1000, close: () => gone.push(ms) });
-  expect(queue.take(heardMs === null ? null : heardMs * 1000)?.timestamp ?? null).toBe(
+  expect(queue.take(heardMs === null ? null : heardMs * 1000, 0)?.timestamp ?? null).toBe(
     shown === null ? null : shown * 1000,
   );
   expect(gone).toEqual(closed);
 });
 
-test("sound waits for a picture that keeps coming late, not for one that was late once", () => {
+test("sound waits for pictures that keep coming late, as long as the least late of them; not for a burst", () => {
   const wait = vi.fn();
   const queue = new PictureQueue(wait);
-  const show = (lateMs: number) => {
-    queue.push({ timestamp: 0, close: () => undefined });
-    queue.take(lateMs * 1000);
+  let nowMs = 0;
+  const show = (pictures: number, lateMs: number, everyMs: number) => {
+    for (let picture = 0; picture < pictures; picture += 1, nowMs += everyMs) {
+      queue.push({ timestamp: 0, close: () => undefined });
+      queue.take((lateMs + (picture % 3)) * 1000, nowMs);
+    }
   };
-  for (let picture = 0; picture < 30; picture += 1) show(picture % 9 === 0 ? 10 : 120);
+  show(70, 300, 5);
+  show(1, 20, 40);
+  show(37, 120, 40);
+  show(1, 20, 40);
   expect(wait).not.toHaveBeenCalled();
-  for (let picture = 0; picture < 10; picture += 1) show(120);
+  show(40, 120, 40);
   expect(wait.mock.calls).toEqual([[120_000]]);
 });
 
 /** Plays pieces of 20 ms at 8 kHz, of which each sample is its own number; returns what `pull` gave, 10 ms at a time. */
 class Player {
-  readonly buffer = new JitterBuffer(8000);
+  readonly buffer: JitterBuffer;
   #pushed = 0;
+
+  constructor(outputRate = 8000) {
+    this.buffer = new JitterBuffer(outputRate);
+  }
 
   push(pieces: number, jumpMs = 0): void {
     for (let piece = 0; piece < pieces; piece += 1, this.#pushed += 160) {
@@ -217,6 +228,14 @@ test("jitter: another stream's time empties it", () => {
   expect(player.pull(1)).toEqual([60_120]);
 });
 
+test("jitter: a device of twice the rate hears what lies between two samples, also of two pieces", () => {
+  const player = new Player(16_000);
+  player.push(6);
+  const output = [new Float32Array(1000)];
+  player.buffer.pull(output);
+  expect([...output[0]!]).toEqual(Array.from({ length: 1000 }, (_, index) => index / 2));
+});
+
 test("jitter: a clock that runs apart is followed, in both directions, without a gap", () => {
   for (const push of [1.003, 0.997]) {
     const player = new Player();
@@ -244,12 +263,24 @@ describe("a stream that cannot be played", () => {
   let fails: boolean[] = [];
   let isSupported = true;
 
+  /** What the decoder was told; for pictures their time in ms. */
+  const told: (string | number)[] = [];
+
   class Decoder {
+    static decodeQueueSize = 0;
     state = "configured";
-    decodeQueueSize = 0;
     constructor(readonly how: { output: (frame: unknown) => void; error: (error: Error) => void }) {}
-    configure(): void {}
+    get decodeQueueSize(): number {
+      return Decoder.decodeQueueSize;
+    }
+    configure({ codec }: { codec: string }): void {
+      told.push(codec);
+    }
+    reset(): void {
+      told.push("reset");
+    }
     decode({ timestamp }: { timestamp: number }): void {
+      told.push(timestamp / 1000);
       if (fails.shift()) queueMicrotask(() => this.how.error(new DOMException("damaged", "EncodingError")));
       else queueMicrotask(() => this.how.output({ timestamp, close: () => undefined }));
     }
@@ -326,6 +357,27 @@ describe("a stream that cannot be played", () => {
     await polling;
     expect(source.obstacle).toBe(null);
     vi.useRealTimers();
+  });
+
+  test("a decoder that falls behind gets nothing more, and makes a fresh start at the next key frame", () => {
+    told.length = 0;
+    fails = [];
+    const player = new VideoPlayer(vi.fn(), vi.fn(), null);
+    const keyFrame = (profile: string) => bytes(`000001 67${profile} 000001 6588`);
+    const give = (ms: number, data: Uint8Array, queued: number) => {
+      Decoder.decodeQueueSize = queued;
+      player.take("H264", ms * 1000, data, { capturedMs: ms, ageMs: 0 });
+    };
+    give(0, bytes("000001 419a"), 0);
+    give(40, keyFrame("4d401f"), 0);
+    give(80, bytes("000001 419a"), kLongestQueue + 1);
+    give(120, bytes("000001 419a"), kLongestQueue);
+    give(160, keyFrame("4d401f"), 9);
+    give(200, bytes("000001 419a"), 1);
+    give(240, keyFrame("64001f"), 1);
+    expect(told).toEqual(["avc1.4d401f", 40, "reset", "avc1.4d401f", 160, 200, "avc1.64001f", 240]);
+    Decoder.decodeQueueSize = 0;
+    player.close();
   });
 
   test("without a decoder no stream is opened at all", async () => {

@@ -39,12 +39,14 @@ const kMostWaiting = 16;
 /** A picture so far ahead of the sound belongs to no sound that will come. */
 const kFarAheadUs = 1_000_000;
 const kLateUs = 40_000;
-const kLateInARow = 10;
+/** What a burst of the network delays is made good sooner. */
+const kLateLimitMs = 1500;
 
 export class PictureQueue<Picture extends Timed> {
   readonly #waiting: Picture[] = [];
   readonly #askSoundToWait: (us: number) => void;
-  #late = 0;
+  #lateSinceMs: number | null = null;
+  #leastLateUs = 0;
 
   /** `askSoundToWait` is called when pictures keep coming after their sound, by so many microseconds. */
   constructor(askSoundToWait: (us: number) => void) {
@@ -63,7 +65,7 @@ export class PictureQueue<Picture extends Timed> {
    * The picture to show at `heardUs` (null: nothing is heard, so the newest); null while none is due. Closes those that
    * are too late beside it; the caller closes the one returned.
    */
-  take(heardUs: number | null): Picture | null {
+  take(heardUs: number | null, nowMs: number): Picture | null {
     const isDue = ({ timestamp }: Picture) =>
       heardUs === null ||
       this.#waiting.length > kMostWaiting ||
@@ -74,7 +76,7 @@ export class PictureQueue<Picture extends Timed> {
       due?.close();
       due = this.#waiting.shift()!;
     }
-    if (due && heardUs !== null) this.#judge(heardUs - due.timestamp);
+    if (due && heardUs !== null) this.#judge(heardUs - due.timestamp, nowMs);
     return due;
   }
 
@@ -82,10 +84,17 @@ export class PictureQueue<Picture extends Timed> {
     for (const picture of this.#waiting.splice(0)) picture.close();
   }
 
-  #judge(lateUs: number): void {
-    this.#late = lateUs > kLateUs ? this.#late + 1 : 0;
-    if (this.#late < kLateInARow) return;
-    this.#late = 0;
-    this.#askSoundToWait(lateUs);
+  #judge(lateUs: number, nowMs: number): void {
+    if (lateUs <= kLateUs) {
+      this.#lateSinceMs = null;
+    } else if (this.#lateSinceMs === null) {
+      this.#lateSinceMs = nowMs;
+      this.#leastLateUs = lateUs;
+    } else {
+      this.#leastLateUs = Math.min(this.#leastLateUs, lateUs);
+      if (nowMs - this.#lateSinceMs < kLateLimitMs) return;
+      this.#lateSinceMs = null;
+      this.#askSoundToWait(this.#leastLateUs);
+    }
   }
 }

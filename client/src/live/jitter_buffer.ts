@@ -2,8 +2,8 @@
 //
 // Holds decoded sound for as long as it takes to play it without gaps, although it comes in bursts.
 //
-// Algorithm     Nothing plays until the wanted amount is here. Then samples go out at the rate they came in, half a per
-//               cent faster or slower where the amount grows or shrinks, since no two clocks agree: that is not heard.
+// Algorithm     Nothing plays until the wanted amount is here. Then samples go out at the rate they came in, one per cent
+//               faster or slower where the amount grows or shrinks, since no two clocks agree: that is not heard.
 //               Where it grows all the same, the oldest is left out, so that sound is never more than a moment late.
 //               Running dry means that the wanted amount was too small: it grows.
 
@@ -22,7 +22,7 @@ const kLongestExtraMs = 400;
 const kSurplusMs = 250;
 /** Stream time that jumps further than this is that of another stream. */
 const kBreakUs = 1_000_000;
-const kCorrection = 0.005;
+const kCorrection = 0.01;
 
 const lengthOf = (piece: SoundPiece) => piece.channels[0]?.length ?? 0;
 const durationMs = (piece: SoundPiece) => (lengthOf(piece) / piece.rate) * 1000;
@@ -91,7 +91,7 @@ export class JitterBuffer {
   }
 
   #speed(bufferedMs: number): number {
-    if (bufferedMs > this.#wantedMs() * 1.5) return 1 + kCorrection;
+    if (bufferedMs > this.#wantedMs() * 1.3) return 1 + kCorrection;
     return bufferedMs < this.#wantedMs() * 0.5 ? 1 - kCorrection : 1;
   }
 

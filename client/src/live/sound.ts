@@ -9,7 +9,10 @@ import type { SpeakerOrder, SpeakerReport } from "./speaker_worklet";
 
 export type SoundPart = Extract<MediaPart, { kind: "sound" }>;
 
-const kLongestQueue = 20;
+/** Some seconds of sound. */
+const kLongestQueue = 200;
+/** No piece of sound is so long. */
+const kGapUs = 300_000;
 
 /** The audio context with the worklet in it. */
 class Speaker {
@@ -57,6 +60,7 @@ export class Sound {
   #decoder: AudioDecoder | null = null;
   #speaker: Speaker | null = null;
   #heardOf = false;
+  #lastUs = 0;
   #trouble = "";
 
   /** `changed` is told when the control for the sound has something new to say. */
@@ -94,9 +98,9 @@ export class Sound {
   }
 
   switchOff(): void {
-    if (this.#decoder?.state !== "closed") this.#decoder?.close();
+    this.#dropDecoder();
     this.#speaker?.close();
-    this.#speaker = this.#decoder = null;
+    this.#speaker = null;
     this.#changed();
   }
 
@@ -105,8 +109,7 @@ export class Sound {
       this.#heardOf = true;
       this.#config = part.config;
       this.#trouble = part.config ? "" : `The sound (${part.codec}) cannot be played`;
-      if (this.#decoder?.state === "configured") this.#decoder.close();
-      this.#decoder = null;
+      this.#dropDecoder();
       this.#changed();
     }
     if (this.#speaker && this.#config) this.#decode(this.#speaker, this.#config, part.timestampUs, body);
@@ -123,7 +126,11 @@ export class Sound {
   }
 
   #decode(speaker: Speaker, config: AudioDecoderConfig, timestamp: number, data: Uint8Array): void {
+    const stepUs = timestamp - this.#lastUs;
+    this.#lastUs = timestamp;
     try {
+      // Decoders count the time of their output on from their first input: after a gap it would be wrong for good.
+      if (stepUs < 0 || stepUs > kGapUs || (this.#decoder?.decodeQueueSize ?? 0) > kLongestQueue) this.#dropDecoder();
       if (!this.#decoder) {
         this.#decoder = new AudioDecoder({
           output: (decoded) => speaker.send(pieceOf(decoded)),
@@ -131,11 +138,15 @@ export class Sound {
         });
         this.#decoder.configure(config);
       }
-      if (this.#decoder.decodeQueueSize > kLongestQueue) return;
       this.#decoder.decode(new EncodedAudioChunk({ type: "key", timestamp, data }));
     } catch {
       this.#fail("The sound cannot be decoded");
     }
+  }
+
+  #dropDecoder(): void {
+    if (this.#decoder && this.#decoder.state !== "closed") this.#decoder.close();
+    this.#decoder = null;
   }
 
   #fail(trouble: string): void {

@@ -113,7 +113,7 @@ export class VideoPlayer {
   #present(): void {
     cancelAnimationFrame(this.#nextTurn);
     const nowMs = performance.now();
-    const image = this.#queue.take(this.#sound?.heardUs(nowMs) ?? null);
+    const image = this.#queue.take(this.#sound?.heardUs(nowMs) ?? null, nowMs);
     if (image) {
       const arrival = this.#arrivalOf(image.timestamp);
       this.#hasShown = true;
