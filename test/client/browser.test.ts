@@ -42,13 +42,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     server.close();
   });
 
-  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900): Promise<Page> {
+  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900, from = address): Promise<Page> {
     server.hasSession = false;
     server.stalled.clear();
     server.cameras.length = 0;
     for (const id of typeof cameras === "number" ? Array.from({ length: cameras }, (_, index) => index + 1) : cameras)
       server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: server.muxed.has(id) ? 3 : 1 });
-    const page = await browser.open(address, widthPx, heightPx);
+    const page = await browser.open(from, widthPx, heightPx);
     await page.until(() => document.querySelector(".login") !== null);
     await page.run(() => {
       addEventListener("securitypolicyviolation", (event) => (document.title += ` ${event.violatedDirective}`));
@@ -153,6 +153,18 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
     await page.press("m");
     await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
+    await leave(page);
+  }, 40_000);
+
+  test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
+    const page = await loggedIn([1, 12], 1440, 900, address.replace("127.0.0.1", "lan.test"));
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 2);
+    await open(["1/1"]);
+    const link = (where: string) => document.querySelector<HTMLAnchorElement>(`${where} a`)?.href;
+    expect(await page.run(link, ".wall-advice")).toBe("https://lan.test:8443/");
+    await page.click("[data-camera='12'] .tile-open");
+    await page.until(() => document.querySelector(".large-state")!.textContent === "live, every 2 s");
+    expect(await page.run(link, ".large .hint")).toBe("https://lan.test:8443/#camera=12");
     await leave(page);
   }, 40_000);
 

@@ -16,6 +16,8 @@ const kFlags = [
   "--disable-quic",
   "--no-first-run",
   "--remote-debugging-pipe",
+  // A name for this machine that a browser does not trust as it does 127.0.0.1.
+  "--host-resolver-rules=MAP lan.test 127.0.0.1",
 ].concat(["--disable-background-networking", "--disable-component-update", "--disable-sync"]);
 
 export const hasBrowser = existsSync(kChromium);

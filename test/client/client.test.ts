@@ -69,6 +69,18 @@ test("the password travels in the body, never in the address", async () => {
   expect([init?.method, String(init?.body)]).toEqual(["POST", "account=ad%26min&password=p%3D1%26x"]);
 });
 
+test.each([
+  [1, "webapi?api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&camera=7&snapshot=1"],
+  [3, "webapi?api=VEXO.Picture&version=1&method=Get&camera=7"],
+])("a snapshot of a camera of video type %i", async (video_type, address) => {
+  const picture = { status: 200, headers: { "Content-Type": "image/jpeg", "X-Capture-Time": "1764023456.5" } };
+  const fetched = vi.fn(async (_address: string) => new Response("jpeg", picture));
+  vi.stubGlobal("fetch", fetched);
+  const snapshot = await new Server(() => undefined).snapshot({ id: 7, video_type } as Camera);
+  expect(fetched.mock.calls[0]![0]).toBe(address);
+  expect([await snapshot.jpeg.text(), snapshot.takenMs]).toEqual(["jpeg", 1764023456500]);
+});
+
 test("a request without an answer ends in time", async () => {
   vi.useFakeTimers();
   vi.stubGlobal("fetch", (_address: string, { signal }: RequestInit) => {

@@ -268,6 +268,7 @@ describe("a stream that cannot be played", () => {
 
   class Decoder {
     static decodeQueueSize = 0;
+    static isMute = false;
     state = "configured";
     constructor(readonly how: { output: (frame: unknown) => void; error: (error: Error) => void }) {}
     get decodeQueueSize(): number {
@@ -281,6 +282,7 @@ describe("a stream that cannot be played", () => {
     }
     decode({ timestamp }: { timestamp: number }): void {
       told.push(timestamp / 1000);
+      if (Decoder.isMute) return;
       if (fails.shift()) queueMicrotask(() => this.how.error(new DOMException("damaged", "EncodingError")));
       else queueMicrotask(() => this.how.output({ timestamp, close: () => undefined }));
     }
@@ -378,6 +380,16 @@ describe("a stream that cannot be played", () => {
     expect(told).toEqual(["avc1.4d401f", 40, "reset", "avc1.4d401f", 160, 200, "avc1.64001f", 240]);
     Decoder.decodeQueueSize = 0;
     player.close();
+  });
+
+  test("a decoder that takes all and gives nothing is given up, once", () => {
+    Decoder.isMute = true;
+    const giveUp = vi.fn();
+    const player = new VideoPlayer(vi.fn(), giveUp, null);
+    const keyFrame = bytes("000001 674d401f 000001 6588");
+    for (let ms = 0; ms < 600; ms += 1) player.take("H264", ms * 1000, keyFrame, { capturedMs: ms, ageMs: 0 });
+    expect(giveUp).toHaveBeenCalledTimes(1);
+    Decoder.isMute = false;
   });
 
   test("without a decoder no stream is opened at all", async () => {

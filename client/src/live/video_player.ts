@@ -15,6 +15,8 @@ const kMostErrors = 3;
 const kErrorsForgottenMs = 30_000;
 /** Longer than the distance of two key frames. */
 const kFirstPictureLimitMs = 12_000;
+/** A decoder that takes so many pictures without giving one never will. */
+const kMostUnanswered = 500;
 
 interface Arrival extends Capture {
   arrivedMs: number;
@@ -46,7 +48,8 @@ export class VideoPlayer {
   take(codec: VideoCodec, timestamp: number, data: Uint8Array, capture: Capture): void {
     if (this.#closed) return;
     const nowMs = performance.now();
-    if (!this.#hasShown && nowMs - this.#startedMs > kFirstPictureLimitMs) return this.#end(kUndecodable);
+    const hasWaitedEnough = !this.#hasShown && nowMs - this.#startedMs > kFirstPictureLimitMs;
+    if (hasWaitedEnough || this.#arrivals.size > kMostUnanswered) return this.#end(kUndecodable);
     const { isKey, codecString } = factsOf(codec, data);
     if (isKey && codecString && codecString !== this.#codecString) this.#configure(codec, codecString);
     if (!this.#decoder) return;

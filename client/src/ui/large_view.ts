@@ -28,7 +28,12 @@ export class LargeView {
   readonly #picture: Picture;
   readonly #source: StreamSource;
   readonly #sound = new Sound(() => this.#showSound());
-  readonly #soundButton = element("button", { type: "button", class: "icon-button sound", hidden: true });
+  readonly #soundButton = element("button", {
+    type: "button",
+    class: "icon-button sound",
+    "aria-label": "Sound",
+    hidden: true,
+  });
   readonly #soundWord = element("span");
   readonly #state = element("span", { class: "large-state" });
   readonly #description = element("span", { class: "large-description" });
