@@ -16,6 +16,8 @@ constexpr std::uint64_t kTableVersion = 0x4c48444d00000001ULL;
 // A stream stamped longer ago than this is news to the recorder, which may have stopped it.
 constexpr std::int64_t kFreshMicros = 2'000'000;
 constexpr std::int64_t kReusableMicros = 60'000'000;
+// Viewers stamp while the recorder looks, so a stamp may be later than the time that the look began.
+constexpr std::int64_t kAheadMicros = 1'000'000;
 
 struct Slot {
     std::atomic<std::uint64_t> key;  // 0 while never used
@@ -32,9 +34,9 @@ LiveStream StreamOf(std::uint64_t key) {
     return {static_cast<std::int32_t>((key >> 31) & 0xffffffff), static_cast<std::int32_t>(key & 0x7fffffff)};
 }
 
-// Stamps of the future are an earlier boot's.
+// Stamps further ahead are an earlier boot's.
 bool IsYounger(std::int64_t touched, std::int64_t now, std::int64_t max_age) {
-    return touched != 0 && touched <= now && now - touched <= max_age;
+    return touched != 0 && touched - now <= kAheadMicros && now - touched <= max_age;
 }
 
 }  // namespace
