@@ -3,7 +3,7 @@
 // Compressed picture and sound: what is read of a stream, keeping up and in step with it, and what is shown in its place.
 
 import { factsOf, type VideoCodec } from "../../client/src/live/annexb";
-import { HeardClock, PictureQueue } from "../../client/src/live/av_clock";
+import { HeardClock, PictureQueue, SentTimes } from "../../client/src/live/av_clock";
 import { FrameGate, kLongestQueue } from "../../client/src/live/frame_gate";
 import { JitterBuffer } from "../../client/src/live/jitter_buffer";
 import { soundConfig } from "../../client/src/live/media_part";
@@ -115,6 +115,16 @@ test("what is heard follows the audio context, and falls silent with the reports
   expect(clock.heardUs(2.6, 601)).toBe(null);
   clock.report(null, 3, 700);
   expect(clock.heardUs(3, 700)).toBe(null);
+});
+
+test.each<[string, sent: number[], counted: number[], found: number[]]>([
+  ["a camera whose samples are longer", [0, 21, 42, 63, 84], [0, 20, 40, 60, 80], [0, 21, 42, 63, 84]],
+  ["a decoder that keeps the first piece to itself", [0, 20, 40], [20, 40], [20, 40]],
+  ["a piece more than was sent", [0, 20], [0, 20, 40], [0, 20, 40]],
+])("time of sound, sent before it is decoded: %s", (_name, sent, counted, found) => {
+  const times = new SentTimes();
+  for (const us of sent) times.sent(us);
+  expect(counted.map((us) => times.decoded(us))).toEqual(found);
 });
 
 test.each<[string, pushed: number[], heardMs: number | null, shown: number | null, closed: number[]]>([

@@ -28,6 +28,32 @@ export class HeardClock {
   }
 }
 
+/**
+ * Finds for each decoded piece of sound the time that it was sent with.
+ *
+ * Why so        Decoders count the time of their output on from their first input, by its samples. A camera's samples are
+ *               never as long as they should be, so that count leaves the stream's time by seconds a day.
+ */
+export class SentTimes {
+  #sentUs: number[] = [];
+  /** What the count was behind for the last piece. */
+  #behindUs = 0;
+
+  sent(us: number): void {
+    this.#sentUs.push(us);
+  }
+
+  /** Of the times sent since the last piece, the one nearest to where the count would be. */
+  decoded(countedUs: number): number {
+    const expectedUs = countedUs + this.#behindUs;
+    const distance = (us: number) => Math.abs(us - expectedUs);
+    while (this.#sentUs.length > 1 && distance(this.#sentUs[1]!) < distance(this.#sentUs[0]!)) this.#sentUs.shift();
+    const us = this.#sentUs.shift() ?? expectedUs;
+    this.#behindUs = us - countedUs;
+    return us;
+  }
+}
+
 export interface Timed {
   /** Stream time, µs. */
   readonly timestamp: number;

@@ -2,7 +2,7 @@
 //
 // The sound of one camera: silent until the user wants it, then decoded and played from a jitter buffer.
 
-import { HeardClock } from "./av_clock";
+import { HeardClock, SentTimes } from "./av_clock";
 import type { MediaPart } from "./media_part";
 import workletAddress from "./speaker_worklet.ts?worker&url";
 import type { SpeakerOrder, SpeakerReport } from "./speaker_worklet";
@@ -59,6 +59,7 @@ export class Sound {
   #config: AudioDecoderConfig | null = null;
   #decoder: AudioDecoder | null = null;
   #speaker: Speaker | null = null;
+  #times = new SentTimes();
   #heardOf = false;
   #lastUs = 0;
   #trouble = "";
@@ -129,15 +130,17 @@ export class Sound {
     const stepUs = timestamp - this.#lastUs;
     this.#lastUs = timestamp;
     try {
-      // Decoders count the time of their output on from their first input: after a gap it would be wrong for good.
+      // A decoder would join what lies on both sides of a gap.
       if (stepUs < 0 || stepUs > kGapUs || (this.#decoder?.decodeQueueSize ?? 0) > kLongestQueue) this.#dropDecoder();
       if (!this.#decoder) {
+        const times = (this.#times = new SentTimes());
         this.#decoder = new AudioDecoder({
-          output: (decoded) => speaker.send(pieceOf(decoded)),
+          output: (decoded) => speaker.send(pieceOf(decoded, times.decoded(decoded.timestamp))),
           error: () => this.#fail("The sound cannot be decoded"),
         });
         this.#decoder.configure(config);
       }
+      this.#times.sent(timestamp);
       this.#decoder.decode(new EncodedAudioChunk({ type: "key", timestamp, data }));
     } catch {
       this.#fail("The sound cannot be decoded");
@@ -155,13 +158,13 @@ export class Sound {
   }
 }
 
-function pieceOf(decoded: AudioData): SpeakerOrder {
+function pieceOf(decoded: AudioData, timestampUs: number): SpeakerOrder {
   const channels = Array.from({ length: Math.min(decoded.numberOfChannels, 2) }, (_, planeIndex) => {
     const samples = new Float32Array(decoded.numberOfFrames);
     decoded.copyTo(samples, { planeIndex, format: "f32-planar" });
     return samples;
   });
-  const piece = { timestampUs: decoded.timestamp, rate: decoded.sampleRate, channels };
+  const piece = { timestampUs, rate: decoded.sampleRate, channels };
   decoded.close();
   return piece;
 }
