@@ -36,16 +36,30 @@ std::string CompactText(const Json::Value& value) {
     return Json::writeString(builder, value);
 }
 
+// True when writing each value inside text gives the same text again; spaces and the order of names are free.
+bool IsReproduced(const Json::Value& value, std::string_view text) {
+    if (value.isObject() || value.isArray()) {
+        return std::all_of(value.begin(), value.end(),
+                           [text](const Json::Value& member) { return IsReproduced(member, text); });
+    }
+    const auto start = static_cast<std::size_t>(value.getOffsetStart());
+    return CompactText(value) == text.substr(start, static_cast<std::size_t>(value.getOffsetLimit()) - start);
+}
+
 }  // namespace
 
 namespace lookhaven::binding {
 
+bool IsAlwaysText(std::string_view name) {
+    return name == "account" || name == "password" || name == "cookie";
+}
+
 Json::Value JsonFromText(std::string_view name, const std::string& text) {
     constexpr std::string_view kFirstBytes = "-0123456789tfn\"[{";
-    if (!text.empty() && kFirstBytes.find(text.front()) != kFirstBytes.npos &&
-        !IsOneOf(name, {"account", "password", "cookie"})) {
+    if (!text.empty() && kFirstBytes.find(text.front()) != kFirstBytes.npos && !IsAlwaysText(name)) {
         std::optional<Json::Value> value = StrictJson(text);
-        if (value && (value->isObject() || value->isArray() || CompactText(*value) == text)) {
+        const bool is_scalar = value && !value->isObject() && !value->isArray();
+        if (value && (is_scalar ? CompactText(*value) == text : IsReproduced(*value, text))) {
             return *std::move(value);
         }
     }

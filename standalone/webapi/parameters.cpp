@@ -90,6 +90,9 @@ void ReadJson(const std::string& body, Parameters& parameters) {
         throw Failure(400, "the body is not a JSON object");
     }
     for (const std::string& name : root.getMemberNames()) {
+        if (binding::IsAlwaysText(name) && !root[name].isString()) {
+            throw Failure(400, "the parameter " + name + " is not a text");
+        }
         parameters[name] = root[name];
     }
 }

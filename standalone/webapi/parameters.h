@@ -17,7 +17,7 @@ using Parameters = std::map<std::string, Json::Value>;
 
 // The parameters of the query string and of a form or JSON body; the body's count before the query's, and the last of
 // two of one name. Throws Failure 400 for a broken escape, a text that is not UTF-8 or holds a NUL, a body that is not
-// one JSON object, or a body of another type.
+// one JSON object or has an account, password or cookie that is no text, or a body of another type.
 Parameters ReadParameters(const ScgiRequest& request);
 
 // The parameter's value; null when it is missing.

@@ -14,7 +14,6 @@ namespace lookhaven::webapi {
 namespace {
 
 constexpr std::chrono::milliseconds kPeriod{500};
-constexpr std::chrono::seconds kPauseAfterFailure{2};
 constexpr std::int64_t kPurgePeriodSeconds = 3600;
 
 void Look(store::Store& records, SlotTable& slots, std::int64_t now_s) {
@@ -52,7 +51,7 @@ void RunWatcher(const base::Installation& installation, SlotTable& slots) {
                 base::LogError("cannot ask which sessions have ended: " + last_problem);
             }
         }
-        std::this_thread::sleep_for(kPauseAfterFailure);
+        std::this_thread::sleep_for(kPeriod);
     }
 }
 

@@ -56,6 +56,9 @@ TEST(GetParam, TakesTextAsJsonOnlyWhenNothingIsLost) {
         {"%7B%22a%22:1%7Dx", "{\"a\":1}x"},
         {"%7B%22a%22:1,%22a%22:2%7D", "{\"a\":1,\"a\":2}"},
         {"%5B1,%5D", "[1,]"},
+        {"[007]", "[007]"},
+        {"%7B%22a%22:%5B1e5%5D%7D", "{\"a\":[1e5]}"},
+        {"[123456789012345678901234567890]", "[123456789012345678901234567890]"},
         {"", ""},
         {"K%C3%BCche", "K\xc3\xbc"
                        "che"},
@@ -112,6 +115,7 @@ TEST(Parameters, RefusesBrokenOnes) {
         Post("", json, "{"),
         Post("", json, "{\"a\":1}{}"),
         Post("", json, "{\"a\":1,\"a\":2}"),
+        Post("", json, "{\"password\":12345678}"),
         Post("", "text/plain", "p=1"),
         Post("", json, nested),
     };
