@@ -63,9 +63,14 @@ std::uint32_t Hash(std::string_view text) {
 
 class Canvas {
   public:
-    Canvas(int width, int height) : width_(width), height_(height), pixels_(static_cast<std::size_t>(width * height)) {}
+    Canvas(int width, int height)
+        : width_(width),
+          height_(height),
+          pixels_(static_cast<std::size_t>(width) * static_cast<std::size_t>(height)) {}
 
-    Colour& At(int x, int y) { return pixels_[static_cast<std::size_t>(y * width_ + x)]; }
+    Colour& At(int x, int y) {
+        return pixels_[static_cast<std::size_t>(y) * static_cast<std::size_t>(width_) + static_cast<std::size_t>(x)];
+    }
     Picture ToPicture(Dice& dice);
 
   private:
