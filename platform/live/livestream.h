@@ -49,16 +49,35 @@ class LH_PLATFORM_API ShmStreamFifo {
     DataEntry* ReadLatest();
     // The newest entry when it differs from lastSeq, else null. May wait up to 100 ms for one; a signal cuts the wait.
     DataEntry* ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position);
+    // The entry after lastSeq, or null when that is the newest; the newest key frame, or the newest audio entry, when
+    // lastSeq is no longer there or names no entry. Never waits.
+    DataEntry* ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position);
+    // The newest key frame, or null.
+    DataEntry* ReadLatestIFrame();
+    void ReadIFrameFinish(DataEntry* entry, __tag_DATA_ENTRY_INFO* position);
     // Gives the entry back; null is allowed. The flag does not tell the medium.
     void ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position);
     // Ends the position's reading and frees its place.
     void StopRead(__tag_DATA_ENTRY_INFO* position);
+
+    // The decoder configuration of a video or audio ring. length: on entry the room, on return the bytes stored, 0 when
+    // there are none or too many. H.264 and H.265: parameter sets as Annex B; AAC: its AudioSpecificConfig.
+    void GetVdoExtraData(unsigned char* data, int& length);
+    void GetAdoExtraData(unsigned char* data, int& length);
+    // "MJPEG", "H264", "H265"; "AAC", "PCMU", "PCMA", "OPUS", or empty where there is no sound. Never null; alive as long
+    // as the attachment.
+    const char* GetVdoCodec();
+    const char* GetAdoCodec();
 };
 
 // Attaches the live video of the camera's stream; null when there is none or the caller may not see it. Asks the
 // recording service for the stream and waits a bounded time (at most 5 s) for its first frame. The caller detaches with
 // shmdt.
 LH_PLATFORM_API ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo);
+
+// Attaches the live audio of a stream whose video the caller has attached; null when it has not. Without sound, or
+// without the right to hear it, a ring that stays empty. The caller detaches with shmdt.
+LH_PLATFORM_API ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo);
 
 // Keeps a live stream alive while a viewer reads it.
 class LH_PLATFORM_API LiveStreamUpdater {

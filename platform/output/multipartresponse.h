@@ -16,6 +16,11 @@ class LH_PLATFORM_API MultipartResponse {
     // Writes one part with the content type, after flushing standard output. data may be null with length 0: an empty
     // part. extra: further part head lines, each ending in CR LF, or null. Returns 0, or -1 when the output is broken.
     int Write(const char* contentType, const void* data, int length, const char* extra);
+    // The same for a frame of a muxed stream, whose part head describes the stream: codecs, decoder configuration of both
+    // media, the frame's timestamp in microseconds. Configuration above 1024 bytes is left out.
+    int Write(const char* contentType, const char* codecs, const unsigned char* videoExtra, int videoExtraLength,
+              const unsigned char* audioExtra, int audioExtraLength, long long timestamp, const void* data, int length,
+              const char* extra);
 
   private:
     bool m_blHeadSent;

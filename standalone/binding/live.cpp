@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Live streams: who may attach a ring, how long attaching waits, and the ring's calls under the platform's names.
+#include <algorithm>
 #include <array>
 #include <csignal>
 #include <cstddef>
 #include <optional>
+#include <span>
 
 #include <time.h>
 
@@ -67,6 +69,18 @@ bool MayWatch(store::Store& records, unsigned int caller, int camera) {
     return caller != 0 && users.Find(id) && !users.DeniedCameras(id, store::CameraAccess::kLive).contains(camera);
 }
 
+bool MayHear(store::Store& records, unsigned int caller, int camera) {
+    return caller == PAIR_AUTH_UID ||
+           !store::Users(records).DeniedCameras(static_cast<int>(caller), store::CameraAccess::kAudio).contains(camera);
+}
+
+void CopyExtraData(const void* stream, unsigned char* data, int& length) {
+    const std::span<const unsigned char> extra = ring::ExtraData(stream);
+    const bool fits = static_cast<int>(extra.size()) <= length;
+    length = fits ? static_cast<int>(extra.size()) : 0;
+    std::copy_n(extra.data(), length, data);
+}
+
 bool HasStream(store::Store& records, int camera_id, int stream) {
     const std::optional<store::Camera> camera = store::Cameras(records).Find(camera_id);
     return camera && camera->enabled && camera->FindProfile(stream) != nullptr;
@@ -109,9 +123,23 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
             !MayWatch(context.Records(), context.Caller(), camId)) {
             return nullptr;
         }
+        context.GrantStream({camId, streamNo}, MayHear(context.Records(), context.Caller(), camId));
         context.CloseRecords();
-        context.GrantStream({camId, streamNo});
         return AttachRunning(context, {camId, streamNo, ring::Medium::kVideo});
+    });
+    return static_cast<ShmStreamFifo*>(stream);
+}
+
+// The recorder makes the ring of the sound before the first picture, so there is nothing to wait for.
+ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
+    const RequestContext& context = RequestContext::Current();
+    void* stream = OrFailure<void*>("LiveAdoStreamFifoAt", nullptr, [&]() -> void* {
+        if (context.GrantedStream() != ring::LiveStream{camId, streamNo}) {
+            return nullptr;
+        }
+        const ring::StreamId id{camId, streamNo, ring::Medium::kAudio};
+        void* sound = context.MayHear() ? ring::Attach(context.Home(), id) : nullptr;
+        return sound != nullptr ? sound : ring::AttachEmpty(id, {});
     });
     return static_cast<ShmStreamFifo*>(stream);
 }
@@ -131,6 +159,19 @@ DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* positio
     return Held(ring::ReadLatest(this, lastSeq, Inner(position)));
 }
 
+DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
+    EndReaderOfRetired(this);
+    return Held(ring::ReadNext(this, lastSeq, Inner(position)));
+}
+
+DataEntry* ShmStreamFifo::ReadLatestIFrame() {
+    return Held(ring::ReadLatestIFrame(this));
+}
+
+void ShmStreamFifo::ReadIFrameFinish(DataEntry* entry, __tag_DATA_ENTRY_INFO* position) {
+    ReadFinish(entry, true, position);
+}
+
 void ShmStreamFifo::ReadFinish(DataEntry* entry, bool, __tag_DATA_ENTRY_INFO* position) {
     RequestContext::Current().SetHeldEntry(nullptr);
     ring::ReadFinish(this, reinterpret_cast<const ring::Entry*>(entry), Inner(position));
@@ -139,6 +180,22 @@ void ShmStreamFifo::ReadFinish(DataEntry* entry, bool, __tag_DATA_ENTRY_INFO* po
 void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
     RequestContext::Current().SetHeldEntry(nullptr);
     ring::StopRead(this, Inner(position));
+}
+
+void ShmStreamFifo::GetVdoExtraData(unsigned char* data, int& length) {
+    CopyExtraData(this, data, length);
+}
+
+void ShmStreamFifo::GetAdoExtraData(unsigned char* data, int& length) {
+    CopyExtraData(this, data, length);
+}
+
+const char* ShmStreamFifo::GetVdoCodec() {
+    return ring::Codec(this);
+}
+
+const char* ShmStreamFifo::GetAdoCodec() {
+    return ring::Codec(this);
 }
 
 LiveStreamUpdater::LiveStreamUpdater(int camId, int streamNo) : m_CamId(camId), m_StreamNo(streamNo) {}

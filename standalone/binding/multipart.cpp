@@ -8,6 +8,8 @@
 #include <cstdio>
 #include <string>
 
+#include <sodium.h>
+
 #include "platform/output/multipartresponse.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
@@ -35,6 +37,17 @@ std::string LiveLines(const void* data, const lookhaven::ring::Entry* entry) {
     return lines.data();
 }
 
+std::string Base64(const unsigned char* data, int length) {
+    if (data == nullptr || length <= 0 || static_cast<std::size_t>(length) > lookhaven::ring::kMaxExtraBytes) {
+        return "";
+    }
+    const auto bytes = static_cast<std::size_t>(length);
+    std::string text(sodium_base64_ENCODED_LEN(bytes, sodium_base64_VARIANT_ORIGINAL), '\0');
+    sodium_bin2base64(text.data(), text.size(), data, bytes, sodium_base64_VARIANT_ORIGINAL);
+    text.pop_back();  // the terminating zero
+    return text;
+}
+
 }  // namespace
 
 MultipartResponse::MultipartResponse() : m_blHeadSent(false) {
@@ -58,4 +71,15 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
                                  {const_cast<void*>(data), static_cast<std::size_t>(length)},
                                  {tail.data(), tail.size()}}};
     return output->Send(pieces) ? 0 : -1;
+}
+
+int MultipartResponse::Write(const char* contentType, const char* codecs, const unsigned char* videoExtra,
+                             int videoExtraLength, const unsigned char* audioExtra, int audioExtraLength,
+                             long long timestamp, const void* data, int length, const char* extra) {
+    std::string lines = "X-Codecs: ";
+    lines.append(codecs).append("\r\nX-Video-Extra: ").append(Base64(videoExtra, videoExtraLength));
+    lines.append("\r\nX-Audio-Extra: ").append(Base64(audioExtra, audioExtraLength));
+    lines.append("\r\nX-Timestamp: ").append(std::to_string(timestamp)).append("\r\n");
+    lines.append(extra == nullptr ? "" : extra);
+    return Write(contentType, data, length, lines.c_str());
 }

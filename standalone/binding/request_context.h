@@ -46,9 +46,13 @@ class LH_PLATFORM_API RequestContext {
     unsigned int Caller() const { return caller_; }
     void SetCaller(unsigned int user_id) { caller_ = user_id; }
 
-    // The live stream that the caller was found to be allowed.
+    // The live stream that the caller was found to be allowed, and whether its sound is too.
     const std::optional<ring::LiveStream>& GrantedStream() const { return granted_; }
-    void GrantStream(ring::LiveStream stream) { granted_ = stream; }
+    bool MayHear() const { return may_hear_; }
+    void GrantStream(ring::LiveStream stream, bool may_hear) {
+        granted_ = stream;
+        may_hear_ = may_hear;
+    }
 
     // A live picture or a stream is asked for.
     void NoteStream();
@@ -65,6 +69,7 @@ class LH_PLATFORM_API RequestContext {
     std::unique_ptr<store::Store> records_;
     unsigned int caller_ = 0;
     std::optional<ring::LiveStream> granted_;
+    bool may_hear_ = false;
     bool is_stream_ = false;
     const ring::Entry* held_entry_ = nullptr;
 };

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The platform's cameras, live streams and multipart output on a script.
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
 
@@ -9,8 +10,10 @@
 #include "platform/output/multipartresponse.h"
 #include "test/support/platform/record.h"
 
+using lookhaven::test::AudioRing;
 using lookhaven::test::Call;
 using lookhaven::test::Script;
+using lookhaven::test::ScriptedFrame;
 using lookhaven::test::Sound;
 
 namespace lookhaven::test {
@@ -23,6 +26,11 @@ Camera MakeCamera(int id, int video_type, bool enabled) {
     camera.m_blEnabled = enabled;
     camera.m_LiveProfile = CAM_PROFILE_LOW;
     return camera;
+}
+
+ShmStreamFifo* AudioRing() {
+    static char segment;
+    return reinterpret_cast<ShmStreamFifo*>(&segment);
 }
 
 }  // namespace lookhaven::test
@@ -101,21 +109,28 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
     Call("LiveStreamFifoAt", camId, streamNo);
     return Script().has_stream ? reinterpret_cast<ShmStreamFifo*>(&segment) : nullptr;
 }
-void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO*) {
-    Call("StartRead");
+ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
+    Call("LiveAdoStreamFifoAt", camId, streamNo);
+    return Script().has_audio_stream ? AudioRing() : nullptr;
 }
-DataEntry* ShmStreamFifo::ReadLatest() {
-    return ReadLatest(-1, nullptr);
+
+namespace {
+
+// The call's name, for a ring of sound with a word in front.
+template <typename... Arguments>
+void RingCall(const ShmStreamFifo* ring, const std::string& name, const Arguments&... arguments) {
+    Call((ring == AudioRing() ? "audio " + name : name).c_str(), arguments...);
 }
-DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
-    Call("ReadLatest", lastSeq);
-    auto& frames = Script().frames;
-    if (frames.empty()) {
-        Script().is_eof = true;
-        return nullptr;
-    }
-    const auto frame = frames.front();
-    frames.pop_front();
+
+const char* NameOf(const __tag_DATA_ENTRY_INFO* position) {
+    return position == nullptr ? "null" : position == Script().audio_position ? "audio position" : "position";
+}
+
+const char* NameOf(const DataEntry* entry) {
+    return entry == nullptr ? "null" : "entry";
+}
+
+DataEntry* Entry(const std::optional<ScriptedFrame>& frame) {
     if (!frame) {
         return nullptr;
     }
@@ -125,14 +140,72 @@ DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
     entry->m_Length = static_cast<int>(length);
     entry->m_SeqNo = frame->seq;
     entry->m_Offset = frame->offset;
+    entry->m_Flags = 0xfffffffdU | (frame->is_key ? DATA_ENTRY_KEY_FRAME : 0);
+    entry->m_TimestampLow = static_cast<std::uint32_t>(frame->timestamp);
+    entry->m_TimestampHigh = static_cast<std::uint32_t>(frame->timestamp >> 32);
     std::memcpy(entry + 1, frame->data.data(), std::min(length, frame->data.size()));
     return entry;
 }
+
+DataEntry* NextOf(std::deque<std::optional<ScriptedFrame>>& frames) {
+    if (frames.empty()) {
+        return nullptr;
+    }
+    const auto frame = frames.front();
+    frames.pop_front();
+    return Entry(frame);
+}
+
+DataEntry* NextPicture() {
+    Script().is_eof = Script().is_eof || Script().frames.empty();
+    return NextOf(Script().frames);
+}
+
+void Give(const std::string& extra, unsigned char* data, int& length) {
+    length = static_cast<int>(extra.copy(reinterpret_cast<char*>(data), static_cast<std::size_t>(length)));
+}
+
+}  // namespace
+
+void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO* position) {
+    Script().audio_position = this == AudioRing() ? position : Script().audio_position;
+    RingCall(this, "StartRead");
+}
+DataEntry* ShmStreamFifo::ReadLatest() {
+    return ReadLatest(-1, nullptr);
+}
+DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
+    return RingCall(this, "ReadLatest", lastSeq), NextPicture();
+}
+DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
+    RingCall(this, "ReadNext", lastSeq, NameOf(position));
+    return this == AudioRing() ? NextOf(Script().audio_frames) : NextPicture();
+}
+DataEntry* ShmStreamFifo::ReadLatestIFrame() {
+    return RingCall(this, "ReadLatestIFrame"), Entry(Script().newest_key_frame);
+}
+void ShmStreamFifo::ReadIFrameFinish(DataEntry* entry, __tag_DATA_ENTRY_INFO* position) {
+    RingCall(this, "ReadIFrameFinish", NameOf(entry), NameOf(position));
+}
 void ShmStreamFifo::ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position) {
-    Call("ReadFinish", entry == nullptr ? "null" : "entry", flag, position == nullptr ? "null" : "position");
+    RingCall(this, "ReadFinish", NameOf(entry), flag, NameOf(position));
 }
 void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO*) {
-    Call("StopRead");
+    RingCall(this, "StopRead");
+}
+void ShmStreamFifo::GetVdoExtraData(unsigned char* data, int& length) {
+    RingCall(this, "GetVdoExtraData", length);
+    Give(Script().video_extra, data, length);
+}
+void ShmStreamFifo::GetAdoExtraData(unsigned char* data, int& length) {
+    RingCall(this, "GetAdoExtraData", length);
+    Give(Script().audio_extra, data, length);
+}
+const char* ShmStreamFifo::GetVdoCodec() {
+    return this == AudioRing() ? "wrong ring" : Script().video_codec.c_str();
+}
+const char* ShmStreamFifo::GetAdoCodec() {
+    return this == AudioRing() ? Script().audio_codec.c_str() : "wrong ring";
 }
 
 LiveStreamUpdater::LiveStreamUpdater(int camId, int streamNo) : m_CamId(camId), m_StreamNo(streamNo) {}
@@ -148,5 +221,15 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
     const std::string text(static_cast<const char*>(data), length < 100 ? static_cast<std::size_t>(length) : 0);
     Call("Write", contentType, data == nullptr ? "null" : text, length, extra == nullptr ? "null" : extra);
     m_blHeadSent = true;
+    return 0;
+}
+int MultipartResponse::Write(const char* contentType, const char* codecs, const unsigned char* videoExtra,
+                             int videoExtraLength, const unsigned char* audioExtra, int audioExtraLength,
+                             long long timestamp, const void* data, int length, const char* extra) {
+    const auto text = [](const void* bytes, int count) {
+        return std::string(static_cast<const char*>(bytes), count < 100 ? static_cast<std::size_t>(count) : 0);
+    };
+    Call("Write", contentType, codecs, text(videoExtra, videoExtraLength), text(audioExtra, audioExtraLength),
+         timestamp, text(data, length), length, extra == nullptr ? "null" : extra);
     return 0;
 }

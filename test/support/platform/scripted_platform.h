@@ -19,6 +19,7 @@
 
 #include "platform/camera/camera.h"
 #include "platform/live/commoncfg.h"
+#include "platform/live/livestream.h"
 #include "platform/log/dbglogcfg.h"
 #include "platform/webapi/apirequest.h"
 #include "platform/webapi/apiresponse.h"
@@ -34,12 +35,14 @@ struct LogLine {
     std::string func, text;
 };
 
-// What one ReadLatest gives.
+// What one read of a ring gives.
 struct ScriptedFrame {
     int seq = 1;
     std::string data = "JPEG";  // the offset's bytes included
     int offset = 0;
     int length = -1;  // -1: of data
+    bool is_key = false;
+    long long timestamp = 0;
 };
 
 enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
@@ -84,6 +87,11 @@ class ScriptedPlatform {
 
     bool has_stream = true;
     std::deque<std::optional<ScriptedFrame>> frames;  // when used up, standard output ends
+    bool has_audio_stream = true;
+    std::deque<std::optional<ScriptedFrame>> audio_frames;
+    std::optional<ScriptedFrame> newest_key_frame;
+    std::string video_codec = "H264", audio_codec = "AAC", video_extra = "V", audio_extra = "A";
+    const void* audio_position = nullptr;  // the one that reads the audio ring
     LHShmCommonCfg common_cfg;
     bool has_common_cfg = true;
     DbgLogCfg log_cfg = {};
@@ -98,6 +106,9 @@ class ScriptedPlatform {
 
 // The one that exists, or null.
 ScriptedPlatform* CurrentPlatform();
+
+// The address that stands for a ring of sound.
+ShmStreamFifo* AudioRing();
 
 // A camera of one stream per profile: 10 · id + profile.
 Camera MakeCamera(int id, int video_type, bool enabled = true);

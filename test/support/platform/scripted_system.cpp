@@ -80,7 +80,7 @@ int __wrap_shmdt(const void* segment) {
     if (CurrentPlatform() == nullptr) {
         return __real_shmdt(segment);
     }
-    return Call("shmdt"), 0;
+    return Call(segment == lookhaven::test::AudioRing() ? "audio shmdt" : "shmdt"), 0;
 }
 int __wrap_pthread_mutex_lock(pthread_mutex_t* mutex) {
     RecordMutex("lock", mutex);
