@@ -15,6 +15,7 @@
 #include "standalone/webapi/answer.h"
 #include "standalone/webapi/auth.h"
 #include "standalone/webapi/parameters.h"
+#include "standalone/webapi/picture.h"
 
 namespace lookhaven::webapi {
 
@@ -93,7 +94,7 @@ std::string Serve(const RequestTask& task, const ScgiRequest& request) {
         return ServeAuth(context, task.slots, request, version, asked.method, asked.parameters);
     }
     const EntryFunction entry = task.modules.Find(api, version, asked.method);
-    if (entry == nullptr) {
+    if (entry == nullptr && api != kPictureApi) {
         throw Failure(404, "no such api, version or method");
     }
     asked.cookies = ReadCookies(request);
@@ -108,7 +109,7 @@ std::string Serve(const RequestTask& task, const ScgiRequest& request) {
     } else if (api != kSelfAdmittingApi) {
         throw Failure(401, "no session");
     }
-    return RunEntry(entry, asked);
+    return entry == nullptr ? ServePicture(context, version, asked.method, asked.parameters) : RunEntry(entry, asked);
 }
 
 std::string ServeOrFail(const RequestTask& task, const ScgiRequest& request) {
