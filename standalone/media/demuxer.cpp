@@ -47,6 +47,19 @@ std::span<const std::uint8_t> Bytes(const AVPacket& packet) {
     return {packet.data, static_cast<std::size_t>(packet.size)};
 }
 
+// What can be told of G.711 is its name, so it must be the usual one.
+bool IsUsualForm(Codec codec, const AVCodecParameters& parameters) {
+    switch (codec) {
+    case Codec::kAac:
+        return parameters.extradata_size > 0;
+    case Codec::kPcmMulaw:
+    case Codec::kPcmAlaw:
+        return parameters.sample_rate == 8000 && parameters.ch_layout.nb_channels == 1;
+    default:
+        return codec == Codec::kOpus;
+    }
+}
+
 }  // namespace
 
 Demuxer::Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, Framing framing)
@@ -106,7 +119,7 @@ void Demuxer::ChooseAudio() {
     const AVStream& stream = *input_->streams[index];
     const AVCodecParameters& parameters = *stream.codecpar;
     const std::optional<Codec> codec = CodecOf(parameters.codec_id);
-    if (!codec || *codec < Codec::kAac || (*codec == Codec::kAac && parameters.extradata_size == 0)) {
+    if (!codec || !IsUsualForm(*codec, parameters)) {
         return;
     }
     audio_index_ = index;

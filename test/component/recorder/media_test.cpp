@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What sources are made of: multipart answers of odd cameras, secrets in texts, parameter sets, clocks, back-off.
+#include <cstdlib>
 #include <cstring>
+#include <filesystem>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include "standalone/media/annexb.h"
 #include "standalone/media/frame_assembler.h"
@@ -258,6 +261,26 @@ TEST(Probe, TellsWhatASourceSends) {
     MjpegCamera camera("viewer:se/cr@t");
     EXPECT_EQ(ProbeSource(camera.Url(), {"viewer", "se/cr@t"}, std::chrono::seconds(5)).video.height, 48);
     EXPECT_THROW(ProbeSource(camera.Url(), {"viewer", "wrong"}, std::chrono::seconds(5)), SourceError);
+}
+
+TEST(Probe, LeavesOutSoundWhoseNameDoesNotTellItsForm) {
+    struct Row {
+        const char* sound;
+        std::optional<Codec> codec;
+    };
+    const std::string path =
+        std::filesystem::temp_directory_path() / ("lookhaven-" + std::to_string(getpid()) + ".mkv");
+    for (const Row& row : {Row{"pcm_mulaw -ar 8000 -ac 1", Codec::kPcmMulaw}, Row{"pcm_mulaw -ar 16000 -ac 1", {}},
+                           Row{"pcm_alaw -ar 8000 -ac 2", {}}, Row{"flac -ar 8000", {}}}) {
+        SCOPED_TRACE(row.sound);
+        const std::string command =
+            "ffmpeg -v error -y -f lavfi -i testsrc=s=64x48:d=2 -f lavfi -i sine=d=2 -c:v libx264 -c:a ";
+        ASSERT_EQ(std::system((command + row.sound + " " + path).c_str()), 0);
+        const ProbeResult result = ProbeSource("file:" + path, {}, std::chrono::seconds(5));
+        EXPECT_EQ(result.video.codec, Codec::kH264);
+        EXPECT_EQ(result.audio ? std::optional(result.audio->codec) : std::nullopt, row.codec);
+    }
+    std::filesystem::remove(path);
 }
 
 TEST(Source, LeavesAnyWaitAtAStopRequest) {

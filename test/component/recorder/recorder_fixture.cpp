@@ -195,6 +195,9 @@ std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data
     const AvPtr<AVCodecContext> context = OwnAv(avcodec_alloc_context3(decoder));
     context->err_recognition = AV_EF_EXPLODE;
     context->thread_count = 1;
+    // What a stream without a configuration of its own is taken for.
+    av_channel_layout_default(&context->ch_layout, 1);
+    context->sample_rate = 8000;
     context->extradata = static_cast<std::uint8_t*>(av_mallocz(extra_data.size() + AV_INPUT_BUFFER_PADDING_SIZE));
     context->extradata_size = static_cast<int>(extra_data.size());
     std::copy(extra_data.begin(), extra_data.end(), context->extradata);
@@ -222,13 +225,13 @@ std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data
     return count;
 }
 
-void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames) {
+void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames, const char* codec) {
     std::size_t key_frames = 0;
     for (std::size_t first = 0; first < entries.size(); ++first) {
         if (entries[first].key_frame) {
             ++key_frames;
             const std::span<const Seen> run = std::span(entries).subspan(first);
-            EXPECT_EQ(Decoded("h264", {}, run), run.size()) << "from entry " << first;
+            EXPECT_EQ(Decoded(codec, {}, run), run.size()) << "from entry " << first;
         }
     }
     EXPECT_GE(key_frames, least_key_frames);

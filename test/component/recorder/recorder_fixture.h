@@ -98,6 +98,7 @@ class RecorderTest : public testing::Test {
 std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data, std::span<const Seen> entries);
 
 // Every run of entries that begins with a key frame decodes whole.
-void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames);
+void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames,
+                                    const char* codec = "h264");
 
 }  // namespace lookhaven::test

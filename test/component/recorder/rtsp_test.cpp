@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder against an RTSP camera that stalls, loses its picture, vanishes and returns.
+// The recorder against an RTSP camera that sends one codec or another, stalls, loses its picture, vanishes and returns.
 #include <csignal>
 #include <cstdlib>
 
@@ -64,6 +64,44 @@ TEST_F(RtspTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
     EXPECT_EQ(recorder.Count("fd"), descriptors);
     EXPECT_EQ(recorder.Count("task"), threads);
     EXPECT_EQ(Segments(), 2u);
+}
+
+TEST_F(RtspTest, EveryCodecComesThroughAndDecodes) {
+    struct Row {
+        const char* path;
+        const char* video;  // the ring's name of the codec, and the decoder's
+        const char* video_decoder;
+        const char* audio;
+        const char* audio_decoder;
+    };
+    const Row rows[] = {
+        {"/h264-pcmu", "H264", "h264", "PCMU", "pcm_mulaw"},
+        {"/h265-pcma", "H265", "hevc", "PCMA", "pcm_alaw"},
+        {"/h265-opus", "H265", "hevc", "OPUS", "opus"},
+        {"/h265-aac", "H265", "hevc", "AAC", "aac"},
+        {"/h264", "H264", "h264", "", nullptr},
+    };
+    MakeStore();
+    const Child rtsp_camera = StartCamera();
+    const Child recorder = StartRecorder("5");
+    for (const Row& row : rows) {
+        SCOPED_TRACE(row.path);
+        const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + row.path);
+        Viewer viewer(*installation_, camera);
+        Viewer listener(*installation_, camera, ring::Medium::kAudio);
+        ExpectDecodesFromEveryKeyFrame(viewer.Take(40), 1, row.video_decoder);
+        ASSERT_FALSE(HasFailure());
+        EXPECT_STREQ(ring::Codec(viewer.Ring()), row.video);
+        EXPECT_FALSE(ring::ExtraData(viewer.Ring()).empty());
+        if (row.audio_decoder != nullptr) {
+            const std::vector<Seen> blocks = listener.Take(20);
+            EXPECT_EQ(Decoded(row.audio_decoder, ring::ExtraData(listener.Ring()), blocks), blocks.size());
+        } else {
+            EXPECT_FALSE(listener.HasPicture());
+        }
+        ASSERT_NE(listener.Ring(), nullptr);
+        EXPECT_STREQ(ring::Codec(listener.Ring()), row.audio);
+    }
 }
 
 }  // namespace

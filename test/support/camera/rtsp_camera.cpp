@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A simulated RTSP camera: H.264 and AAC at rtsp://127.0.0.1:<port>/live, for any number of clients.
+// A simulated RTSP camera: H.264 and AAC at rtsp://127.0.0.1:<port>/live, for any number of clients, and other codecs
+// under the other paths.
 //
 //   rtsp-camera <port>     0 takes a free one; the port is printed when the camera is ready
 //
@@ -8,6 +9,7 @@
 // to vanish, kill it. The pipeline ends with its parent.
 #include <csignal>
 #include <cstdio>
+#include <string>
 #include <vector>
 
 #include <glib-unix.h>
@@ -16,12 +18,28 @@
 
 namespace {
 
-constexpr const char* kPipeline =
-    "( videotestsrc is-live=true pattern=ball ! video/x-raw,format=I420,width=320,height=240,framerate=25/1 "
-    "! valve name=picture ! x264enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
-    "! rtph264pay name=pay0 pt=96 config-interval=-1 "
-    "audiotestsrc is-live=true wave=ticks ! audio/x-raw,rate=16000,channels=1 ! avenc_aac bitrate=32000 "
-    "! rtpmp4gpay name=pay1 pt=97 )";
+constexpr const char* kPicture =
+    "videotestsrc is-live=true pattern=ball ! video/x-raw,format=I420,width=320,height=240,framerate=25/1 "
+    "! valve name=picture ! ";
+constexpr const char* kH264 = "x264enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
+                              "! rtph264pay name=pay0 pt=96 config-interval=-1 ";
+constexpr const char* kH265 = "x265enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
+                              "! rtph265pay name=pay0 pt=96 config-interval=-1 ";
+
+struct Mount {
+    const char* path;
+    const char* video;
+    const char* audio;  // what follows the raw sound; empty: no sound
+};
+
+constexpr Mount kMounts[] = {
+    {"/live", kH264, "audio/x-raw,rate=16000,channels=1 ! avenc_aac bitrate=32000 ! rtpmp4gpay name=pay1 pt=97"},
+    {"/h264-pcmu", kH264, "audio/x-raw,rate=8000,channels=1 ! mulawenc ! rtppcmupay name=pay1 pt=0"},
+    {"/h265-pcma", kH265, "audio/x-raw,rate=8000,channels=1 ! alawenc ! rtppcmapay name=pay1 pt=8"},
+    {"/h265-opus", kH265, "audio/x-raw,rate=48000,channels=1 ! opusenc ! rtpopuspay name=pay1 pt=97"},
+    {"/h265-aac", kH265, "audio/x-raw,rate=48000,channels=2 ! avenc_aac ! rtpmp4gpay name=pay1 pt=97"},
+    {"/h264", kH264, ""},
+};
 
 bool g_withheld = false;
 std::vector<GstElement*> g_valves;  // of all clients
@@ -49,11 +67,16 @@ int main(int argc, char** argv) {
     GstRTSPServer* server = gst_rtsp_server_new();
     gst_rtsp_server_set_address(server, "127.0.0.1");
     gst_rtsp_server_set_service(server, argc > 1 ? argv[1] : "0");
-    GstRTSPMediaFactory* factory = gst_rtsp_media_factory_new();
-    gst_rtsp_media_factory_set_launch(factory, kPipeline);
-    g_signal_connect(factory, "media-configure", G_CALLBACK(OnMedia), nullptr);
     GstRTSPMountPoints* mounts = gst_rtsp_server_get_mount_points(server);
-    gst_rtsp_mount_points_add_factory(mounts, "/live", factory);
+    for (const Mount& mount : kMounts) {
+        const std::string sound =
+            *mount.audio == '\0' ? "" : "audiotestsrc is-live=true wave=ticks ! " + std::string(mount.audio);
+        const std::string pipeline = std::string("( ") + kPicture + mount.video + sound + " )";
+        GstRTSPMediaFactory* factory = gst_rtsp_media_factory_new();
+        gst_rtsp_media_factory_set_launch(factory, pipeline.c_str());
+        g_signal_connect(factory, "media-configure", G_CALLBACK(OnMedia), nullptr);
+        gst_rtsp_mount_points_add_factory(mounts, mount.path, factory);
+    }
     g_object_unref(mounts);
     if (gst_rtsp_server_attach(server, nullptr) == 0) {
         std::fprintf(stderr, "rtsp-camera: cannot listen\n");
