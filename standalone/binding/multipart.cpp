@@ -4,8 +4,10 @@
 //
 // Format        The boundary follows each part at once, not only before the next: a browser shows a part when it has
 //               seen its end.
+#include <algorithm>
 #include <array>
-#include <cstdio>
+#include <charconv>
+#include <cstdint>
 #include <string>
 
 #include <sodium.h>
@@ -19,22 +21,30 @@ namespace {
 using lookhaven::binding::Output;
 using lookhaven::binding::RequestContext;
 
-std::string ResponseHead(const std::string& boundary) {
-    return "Content-Type: multipart/x-mixed-replace; boundary=" + boundary +
-           "\r\nCache-Control: no-store\r\nX-Accel-Buffering: no\r\n\r\n--" + boundary + "\r\n";
+// Appends decimal digits; a stream does this for every picture, so without the machinery of printf.
+void AppendNumber(std::string& text, std::int64_t number, int width = 1) {
+    std::array<char, 24> digits;
+    const auto end = std::to_chars(digits.data(), digits.data() + digits.size(), number).ptr;
+    text.append(static_cast<std::size_t>(std::max<std::int64_t>(0, width - (end - digits.data()))), '0');
+    text.append(digits.data(), end);
+}
+
+void AppendResponseHead(std::string& head, const std::string& boundary) {
+    head.append("Content-Type: multipart/x-mixed-replace; boundary=").append(boundary);
+    head.append("\r\nCache-Control: no-store\r\nX-Accel-Buffering: no\r\n\r\n--").append(boundary).append("\r\n");
 }
 
 // Capture time and age when the data lies in the ring entry that is being read, else nothing.
-std::string LiveLines(const void* data, const lookhaven::ring::Entry* entry) {
+void AppendLiveLines(std::string& head, const void* data, const lookhaven::ring::Entry* entry) {
     const auto* byte = static_cast<const unsigned char*>(data);
     if (entry == nullptr || byte < entry->Data() || byte > entry->Data() + entry->length) {
-        return "";
+        return;
     }
-    const long long captured = entry->CaptureMillis();
-    std::array<char, 96> lines{};
-    std::snprintf(lines.data(), lines.size(), "X-Capture-Time: %lld.%03d\r\nX-Age-Ms: %lld\r\n", captured / 1000,
-                  static_cast<int>(captured % 1000), static_cast<long long>(lookhaven::base::WallMillis()) - captured);
-    return lines.data();
+    const std::int64_t captured = entry->CaptureMillis();
+    AppendNumber(head.append("X-Capture-Time: "), captured / 1000);
+    AppendNumber(head.append("."), captured % 1000, 3);
+    AppendNumber(head.append("\r\nX-Age-Ms: "), lookhaven::base::WallMillis() - captured);
+    head.append("\r\n");
 }
 
 std::string Base64(const unsigned char* data, int length) {
@@ -61,11 +71,17 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
         return -1;
     }
     context.CloseRecords();
-    std::string head = m_blHeadSent ? "" : ResponseHead(output->Boundary());
-    head.append("Content-Type: ").append(contentType).append("\r\nContent-Length: ").append(std::to_string(length));
-    head.append("\r\n").append(LiveLines(data, context.HeldEntry()));
+    // Kept, so that a stream allocates nothing per part.
+    static std::string head;
+    head.clear();
+    if (!m_blHeadSent) {
+        AppendResponseHead(head, output->Boundary());
+    }
+    AppendNumber(head.append("Content-Type: ").append(contentType).append("\r\nContent-Length: "), length);
+    AppendLiveLines(head.append("\r\n"), data, context.HeldEntry());
     head.append(extra == nullptr ? "" : extra).append("\r\n");
-    std::string tail = "\r\n--" + output->Boundary() + "\r\n";
+    static std::string tail;
+    tail.assign("\r\n--").append(output->Boundary()).append("\r\n");
     m_blHeadSent = true;
     std::array<iovec, 3> pieces{{{head.data(), head.size()},
                                  {const_cast<void*>(data), static_cast<std::size_t>(length)},
