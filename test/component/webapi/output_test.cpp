@@ -141,6 +141,28 @@ TEST_F(OutputTest, KeepsTheOrderOfStdioAndParts) {
     EXPECT_EQ(answer.find("HTTP/"), answer.npos);
 }
 
+TEST_F(OutputTest, DescribesAMuxedStreamInEveryPart) {
+    Open();
+    StartReading(0us);
+    MultipartResponse response;
+    const std::string extra(1025, '\xff');
+    const auto* bytes = reinterpret_cast<const unsigned char*>(extra.data());
+    const std::int64_t timestamp = 0x500000001LL;
+    response.Write("image/H264", "H264;AAC", bytes, 2, bytes, 1024, timestamp, "abc", 3, nullptr);
+    response.Write("audio/AAC", "H264;", bytes, 1025, nullptr, 0, -1, "d", 1, "X-More: 1\r\n");
+    const std::string answer = FinishReading();
+    EXPECT_EQ(Parts(answer), (std::vector<std::string>{"abc", "d"}));
+    const std::string whole = std::string(341 * 4, '/') + "/w==";
+    EXPECT_NE(
+        answer.find("Content-Type: image/H264\r\nContent-Length: 3\r\nX-Codecs: H264;AAC\r\nX-Video-Extra: //8=\r\n"
+                    "X-Audio-Extra: " +
+                    whole + "\r\nX-Timestamp: 21474836481\r\n\r\nabc"),
+        answer.npos);
+    EXPECT_NE(answer.find("Content-Type: audio/AAC\r\nContent-Length: 1\r\nX-Codecs: H264;\r\nX-Video-Extra: \r\n"
+                          "X-Audio-Extra: \r\nX-Timestamp: -1\r\nX-More: 1\r\n\r\nd"),
+              answer.npos);
+}
+
 TEST_F(OutputTest, BreaksForGoodWithADeafOrVanishedClient) {
     struct Case {
         const char* name;
