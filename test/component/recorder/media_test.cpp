@@ -16,6 +16,7 @@
 #include "standalone/media/pace.h"
 #include "standalone/media/probe.h"
 #include "standalone/media/source_url.h"
+#include "standalone/media/still.h"
 #include "standalone/recorder/backoff.h"
 #include "test/support/camera/mjpeg_camera.h"
 
@@ -281,6 +282,15 @@ TEST(Probe, LeavesOutSoundWhoseNameDoesNotTellItsForm) {
         EXPECT_EQ(result.audio ? std::optional(result.audio->codec) : std::nullopt, row.codec);
     }
     std::filesystem::remove(path);
+}
+
+TEST(Still, RefusesWhatIsNoPicture) {
+    const std::vector<std::uint8_t> noise(1000, 0xa5);
+    const std::vector<std::uint8_t> sets_only{0, 0, 0, 1, 0x67, 0x42, 0xc0, 0x0a, 0, 0, 0, 1, 0x68, 0xce};
+    for (const Codec codec : {Codec::kH264, Codec::kH265}) {
+        EXPECT_THROW(JpegOfKeyFrame(codec, noise), SourceError);
+        EXPECT_THROW(JpegOfKeyFrame(codec, sets_only), SourceError);
+    }
 }
 
 TEST(Source, LeavesAnyWaitAtAStopRequest) {

@@ -1,15 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The recorder against an RTSP camera that sends one codec or another, stalls, loses its picture, vanishes and returns.
+#include <algorithm>
 #include <csignal>
 #include <cstdlib>
 
 #include "standalone/base/file.h"
+#include "standalone/media/jpeg.h"
+#include "standalone/media/still.h"
 #include "test/component/recorder/recorder_fixture.h"
 
 namespace lookhaven::test {
 
 namespace {
+
+void ExpectStill(const Seen& key_frame, media::Codec codec) {
+    const std::vector<std::uint8_t> jpeg = media::JpegOfKeyFrame(
+        codec, {reinterpret_cast<const std::uint8_t*>(key_frame.data.data()), key_frame.data.size()});
+    const std::optional<media::PictureSize> size = media::JpegSize(jpeg);
+    EXPECT_TRUE(size && size->width == 320 && size->height == 240);
+}
 
 class RtspTest : public RecorderTest {
   protected:
@@ -89,8 +99,11 @@ TEST_F(RtspTest, EveryCodecComesThroughAndDecodes) {
         const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + row.path);
         Viewer viewer(*installation_, camera);
         Viewer listener(*installation_, camera, ring::Medium::kAudio);
-        ExpectDecodesFromEveryKeyFrame(viewer.Take(40), 1, row.video_decoder);
+        const std::vector<Seen> pictures = viewer.Take(40);
+        ExpectDecodesFromEveryKeyFrame(pictures, 1, row.video_decoder);
         ASSERT_FALSE(HasFailure());
+        ExpectStill(*std::find_if(begin(pictures), end(pictures), [](const Seen& seen) { return seen.key_frame; }),
+                    row.video == std::string("H265") ? media::Codec::kH265 : media::Codec::kH264);
         EXPECT_STREQ(ring::Codec(viewer.Ring()), row.video);
         EXPECT_FALSE(ring::ExtraData(viewer.Ring()).empty());
         if (row.audio_decoder != nullptr) {
