@@ -26,16 +26,28 @@ Seconds EndOf(const SessionLifetime& lifetime, std::int64_t created_s, std::int6
 }  // namespace
 
 NewSession Sessions::Create(int user_id, std::int64_t now_s) {
+    return Insert(user_id, nullptr, now_s);
+}
+
+NewSession Sessions::Create(const VerifiedUser& user, std::int64_t now_s) {
+    return Insert(user.id, &user.password_hash, now_s);
+}
+
+NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::int64_t now_s) {
     const NewSession session{RandomHex(kSecretBytes), RandomHex(kHandleBytes)};
     const std::string hash = Digest(session.secret);
     const Seconds now = now_s;
     const Seconds expires = EndOf(lifetime_, now_s, now_s);
+    const int any_password = password_hash == nullptr;
+    const std::string verified = password_hash == nullptr ? "" : *password_hash;
     connection_.Write([&](soci::session& sql) {
         int found = 0;
         sql << "insert into sessions (secret_hash, handle, user_id, created, last_seen, expires)"
-               " select :hash, :handle, id, :created, :seen, :expires from users where id = :user returning user_id",
+               " select :hash, :handle, id, :created, :seen, :expires from users where id = :user"
+               " and (password_hash = :verified or :any = 1) returning user_id",
             soci::use(hash, "hash"), soci::use(session.handle, "handle"), soci::use(now, "created"),
-            soci::use(now, "seen"), soci::use(expires, "expires"), soci::use(user_id, "user"), soci::into(found);
+            soci::use(now, "seen"), soci::use(expires, "expires"), soci::use(user_id, "user"),
+            soci::use(verified, "verified"), soci::use(any_password, "any"), soci::into(found);
         if (!sql.got_data()) {
             throw NotFound("there is no account " + std::to_string(user_id));
         }

@@ -45,6 +45,9 @@ class Sessions {
 
     // Throws NotFound for an unknown user.
     NewSession Create(int user_id, std::int64_t now_s);
+    // The same at a log-in. Throws NotFound too when the password has changed since it was checked, for that change could
+    // not end a session that did not exist yet.
+    NewSession Create(const VerifiedUser& user, std::int64_t now_s);
 
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
@@ -64,6 +67,9 @@ class Sessions {
     int PurgeExpired(std::int64_t now_s);
 
   private:
+    // password_hash: null when it does not matter.
+    NewSession Insert(int user_id, const std::string* password_hash, std::int64_t now_s);
+
     Connection& connection_;
     SessionLifetime lifetime_;
 };

@@ -69,7 +69,7 @@ User Users::Add(std::string_view name, std::string_view password, Privilege priv
     });
 }
 
-std::optional<User> Users::CheckPassword(std::string_view name, std::string_view password) {
+std::optional<VerifiedUser> Users::CheckPassword(std::string_view name, std::string_view password) {
     const std::optional<User> user = FindByName(name);
     std::optional<std::string> hash;
     if (user) {
@@ -81,7 +81,10 @@ std::optional<User> Users::CheckPassword(std::string_view name, std::string_view
             }
         });
     }
-    return PasswordMatches(hash, password.substr(0, kMaxPasswordBytes + 1)) ? user : std::nullopt;
+    if (!PasswordMatches(hash, password.substr(0, kMaxPasswordBytes + 1))) {
+        return std::nullopt;
+    }
+    return VerifiedUser{*user, *hash};
 }
 
 std::optional<User> Users::Find(int id) {

@@ -32,6 +32,11 @@ struct User {
     bool IsManager() const { return privilege <= Privilege::kManager; }
 };
 
+// A user whose password was right, with the hash that said so: it is gone once the password changes.
+struct VerifiedUser : User {
+    std::string password_hash;
+};
+
 // Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
 //               (2) Names are told apart without regard to case, and "Lookhaven" is nobody's name.
 class Users {
@@ -44,7 +49,7 @@ class Users {
     User Add(std::string_view name, std::string_view password, Privilege privilege);
 
     // The account when name and password are right. An unknown name takes as long as a wrong password.
-    std::optional<User> CheckPassword(std::string_view name, std::string_view password);
+    std::optional<VerifiedUser> CheckPassword(std::string_view name, std::string_view password);
 
     std::optional<User> Find(int id);
     std::optional<User> FindByName(std::string_view name);

@@ -56,7 +56,7 @@ std::string LogIn(store::Store& records, const ScgiRequest& request, const Param
         throw Failure(401, "wrong account or password");
     }
     throttle.Clear(account, address);
-    const store::NewSession session = store::Sessions(records).Create(user->id, NowSeconds());
+    const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
     return Success(Identity(user->name, user->id, user->IsManager()), CookieLine(request, session.secret));
 }
 

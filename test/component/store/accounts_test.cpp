@@ -133,6 +133,10 @@ TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
         EXPECT_EQ(sessions_.EndedAmong({session.handle, other.handle}, kNow).size(), row.ends ? 1U : 0U) << row.change;
     }
     EXPECT_TRUE(sessions_.FindBySecret(other.secret, kNow));
+    const auto verified = users_.CheckPassword("eve", kPassword);
+    EXPECT_TRUE(sessions_.FindBySecret(sessions_.Create(*verified, kNow).secret, kNow));
+    users_.SetPassword(verified->id, "another one");
+    EXPECT_THROW(sessions_.Create(*verified, kNow), NotFound) << "a log-in that the change overtook";
     EXPECT_THROW(sessions_.Create(id, kNow), NotFound) << "the account is gone";
 }
 
