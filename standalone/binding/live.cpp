@@ -117,7 +117,7 @@ void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
 
 ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
     RequestContext& context = RequestContext::Current();
-    context.NoteStream();
+    context.NotePicture();
     void* stream = OrFailure<void*>("LiveStreamFifoAt", nullptr, [&]() -> void* {
         if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo) ||
             !MayWatch(context.Records(), context.Caller(), camId)) {

@@ -30,7 +30,7 @@ class LH_PLATFORM_API RequestContext {
     RequestContext& operator=(const RequestContext&) = delete;
 
     // Borrows output for the rest of the process's life, null where nothing is sent. on_stream is called once, when it
-    // turns out that the request asks for a live picture or a stream: such a request may take its time.
+    // turns out that the answer is a stream: such a request may take its time.
     void Begin(const base::Installation& installation, Output* output, std::function<void()> on_stream);
 
     // Throws std::logic_error before Begin.
@@ -54,9 +54,11 @@ class LH_PLATFORM_API RequestContext {
         may_hear_ = may_hear;
     }
 
-    // A live picture or a stream is asked for.
+    // The answer is a stream: it may last.
     void NoteStream();
-    bool IsStream() const { return is_stream_; }
+    // The answer is a picture, alone or in a stream.
+    void NotePicture() { wants_picture_ = true; }
+    bool WantsPicture() const { return wants_picture_ || is_stream_; }
 
     // The ring entry that was read last and not given back; null when there is none.
     const ring::Entry* HeldEntry() const { return held_entry_; }
@@ -71,6 +73,7 @@ class LH_PLATFORM_API RequestContext {
     std::optional<ring::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;
+    bool wants_picture_ = false;
     const ring::Entry* held_entry_ = nullptr;
 };
 

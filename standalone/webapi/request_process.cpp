@@ -68,7 +68,7 @@ std::string RunEntry(EntryFunction entry, VEXO::APIRequest::Context& asked) {
     if (given.answer && given.output_enabled) {
         return JsonAnswer(200, *given.answer);
     }
-    if (context.IsStream()) {
+    if (context.WantsPicture()) {
         throw Failure(504, "no picture came");
     }
     if (!asked.login) {
