@@ -2,6 +2,7 @@
 #include "standalone/ring/reader.h"
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <system_error>
 
@@ -34,6 +35,11 @@ void* Attach(const base::Installation& installation, const StreamId& id) try {
         return nullptr;
     }
     if (found->check != SegmentCheck::kGood) {
+        // Said once, for whoever waits for a ring asks again and again.
+        static std::atomic_flag said;
+        if (said.test_and_set()) {
+            return nullptr;
+        }
         base::LogError("the ring of camera " + std::to_string(id.camera) + " stream " + std::to_string(id.stream) +
                        (found->check == SegmentCheck::kOtherLayout ? " was made by another version of the recorder"
                                                                    : " is damaged") +
