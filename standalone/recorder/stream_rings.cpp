@@ -41,7 +41,7 @@ void StreamRings::Write(const media::Packet& packet, const std::optional<media::
     const ring::Frame frame{packet.data, 0, packet.key_frame, packet.timestamp_us, CaptureMillis(packet.timestamp_us)};
     if (packet.medium == media::Medium::kAudio) {
         if (audio_) {
-            audio_->Write(frame);
+            audio_->writer.Write(frame);
         }
         return;
     }
@@ -53,22 +53,22 @@ void StreamRings::Write(const media::Packet& packet, const std::optional<media::
              VideoEstimate(*packet.format, packet.data.size()));
         video_format_ = *packet.format;
     }
-    video_->Write(frame);
+    video_->writer.Write(frame);
 }
 
 void StreamRings::EndRun() {
     video_format_.reset();
-    for (std::optional<ring::Writer>* writer : {&video_, &audio_}) {
-        if (*writer) {
-            (*writer)->StartRun();
+    for (std::optional<Ring>* ring : {&video_, &audio_}) {
+        if (*ring) {
+            (*ring)->writer.StartRun();
         }
     }
 }
 
 void StreamRings::Beat() {
-    for (std::optional<ring::Writer>* writer : {&video_, &audio_}) {
-        if (*writer) {
-            (*writer)->Beat();
+    for (std::optional<Ring>* ring : {&video_, &audio_}) {
+        if (*ring) {
+            (*ring)->writer.Beat();
         }
     }
 }
@@ -83,14 +83,15 @@ void StreamRings::OpenAudio(const std::optional<media::StreamFormat>& audio, med
     Open(audio_, ring::Medium::kAudio, format, {ring::Medium::kAudio, true, kAudioBitsPerSecond, 0, 0});
 }
 
-void StreamRings::Open(std::optional<ring::Writer>& writer, ring::Medium medium, const ring::StreamFormat& format,
+// A ring of another format is retired first: its size was that of other frames.
+void StreamRings::Open(std::optional<Ring>& ring, ring::Medium medium, const ring::StreamFormat& format,
                        const ring::StreamEstimate& estimate) {
-    if (writer) {
-        writer->SetFormat(format);
+    if (ring && ring->format == format) {
         return;
     }
-    writer.emplace(installation_, ring::StreamId{stream_.camera, stream_.stream, medium}, format,
-                   ring::GeometryFor(estimate));
+    ring.reset();
+    const ring::StreamId id{stream_.camera, stream_.stream, medium};
+    ring.emplace(Ring{format, ring::Writer(installation_, id, format, ring::GeometryFor(estimate))});
 }
 
 }  // namespace lookhaven::recorder

@@ -24,9 +24,9 @@ class StreamRings {
         : installation_(installation),
           stream_(stream) {}
 
-    // Appends the packet; a packet of another format than before moves the stream to a new ring. The first packet of a
-    // run is a picture. audio is the format of the sound that goes with it. Throws std::exception when the rings
-    // cannot be made.
+    // Appends the packet; a packet of another format than before moves the stream to a new ring of a fitting size. The
+    // first packet of a run is a picture. audio is the format of the sound that goes with it. Throws std::exception
+    // when the rings cannot be made.
     void Write(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
 
     // The source failed: what it sent is old now, and no viewer finds it any more.
@@ -36,14 +36,19 @@ class StreamRings {
     void Beat();
 
   private:
+    struct Ring {
+        ring::StreamFormat format;
+        ring::Writer writer;
+    };
+
     void OpenAudio(const std::optional<media::StreamFormat>& audio, media::Codec video_codec);
-    void Open(std::optional<ring::Writer>& writer, ring::Medium medium, const ring::StreamFormat& format,
+    void Open(std::optional<Ring>& ring, ring::Medium medium, const ring::StreamFormat& format,
               const ring::StreamEstimate& estimate);
 
     const base::Installation& installation_;
     ring::LiveStream stream_;
-    std::optional<ring::Writer> video_;
-    std::optional<ring::Writer> audio_;
+    std::optional<Ring> video_;
+    std::optional<Ring> audio_;
     std::optional<media::StreamFormat> video_format_;  // of this run
 };
 

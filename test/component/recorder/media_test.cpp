@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/media/annexb.h"
 #include "standalone/media/frame_assembler.h"
 #include "standalone/media/jpeg.h"
@@ -18,6 +19,8 @@
 #include "standalone/media/source_url.h"
 #include "standalone/media/still.h"
 #include "standalone/recorder/backoff.h"
+#include "standalone/recorder/stream_rings.h"
+#include "standalone/ring/inventory.h"
 #include "test/support/camera/mjpeg_camera.h"
 
 namespace lookhaven::test {
@@ -250,6 +253,28 @@ TEST(Backoff, GrowsToItsCapAndBeginsAnewAfterStableFlow) {
         }
         EXPECT_LE(backoff.AfterFailure(Backoff::kStable), Backoff::kFirst);
     }
+}
+
+TEST(StreamRings, FitTheSizeOfTheLatestFormat) {
+    std::string home = (std::filesystem::temp_directory_path() / "lookhaven-rings-XXXXXX").string();
+    ASSERT_NE(::mkdtemp(home.data()), nullptr);
+    base::Installation::CreateFolders(home);
+    const base::Installation installation(home);
+    {
+        recorder::StreamRings rings(installation, {1, 0});
+        const auto size_after = [&](int width, int height) {
+            const StreamFormat format{Codec::kMjpeg, width, height, 0, 0, {}};
+            const std::vector<std::uint8_t> frame(1000);
+            rings.Write({Medium::kVideo, frame, base::MonotonicMicros(), true, &format}, std::nullopt);
+            const std::vector<ring::SegmentState> segments = ring::ListSegments(installation);
+            return segments.size() == 1 ? segments[0].size_bytes : 0;
+        };
+        const std::uint64_t small = size_after(160, 120);
+        EXPECT_GT(size_after(1280, 720), 4 * small) << "within a run";
+        rings.EndRun();
+        EXPECT_EQ(size_after(160, 120), small) << "from run to run";
+    }
+    std::filesystem::remove_all(home);
 }
 
 TEST(Probe, TellsWhatASourceSends) {
