@@ -2,11 +2,14 @@
 #include "standalone/base/process.h"
 
 #include <array>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <stdexcept>
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
@@ -18,28 +21,47 @@ std::uint64_t ProcessStartTicks(pid_t pid) {
     std::snprintf(path.data(), path.size(), "/proc/%d/stat", static_cast<int>(pid));
     const FileDescriptor file(::open(path.data(), O_RDONLY | O_CLOEXEC));
     if (!file) {
-        return 0;
+        return errno == ENOENT ? 0 : kUnknownStart;
     }
     std::array<char, 1024> text{};
     const ssize_t length = ::read(file.Get(), text.data(), text.size() - 1);
+    if (length <= 0) {
+        return length < 0 && errno == ESRCH ? 0 : kUnknownStart;
+    }
     // The command name in parentheses may hold anything, so the fields are counted from its last parenthesis.
-    const char* field = length > 0 ? std::strrchr(text.data(), ')') : nullptr;
-    if (field == nullptr || field[1] == '\0' || field[2] == 'Z' || field[2] == 'X') {
+    const char* field = std::strrchr(text.data(), ')');
+    if (field != nullptr && field[1] == ' ' && (field[2] == 'Z' || field[2] == 'X')) {
         return 0;
     }
     // State is field 3 and the start time field 22.
     for (int number = 2; field != nullptr && number < 22; ++number) {
         field = std::strchr(field + 1, ' ');
     }
-    return field == nullptr ? 0 : std::strtoull(field + 1, nullptr, 10);
+    return field == nullptr ? kUnknownStart : std::strtoull(field + 1, nullptr, 10);
 }
 
 ProcessIdentity ThisProcess() {
-    return {static_cast<std::int32_t>(getpid()), ProcessStartTicks(getpid())};
+    const std::uint64_t start_ticks = ProcessStartTicks(getpid());
+    if (start_ticks == 0 || start_ticks == kUnknownStart) {
+        throw std::runtime_error("cannot read this process's start time from /proc");
+    }
+    return {static_cast<std::int32_t>(getpid()), start_ticks};
 }
 
 bool IsAlive(const ProcessIdentity& process) {
-    return process.pid > 0 && process.start_ticks != 0 && ProcessStartTicks(process.pid) == process.start_ticks;
+    if (process.pid <= 0 || process.start_ticks == 0) {
+        return false;
+    }
+    const std::uint64_t start_ticks = ProcessStartTicks(process.pid);
+    return start_ticks == process.start_ticks || start_ticks == kUnknownStart;
+}
+
+void RaiseDescriptorLimit() {
+    rlimit limit{};
+    if (::getrlimit(RLIMIT_NOFILE, &limit) == 0) {
+        limit.rlim_cur = limit.rlim_max;
+        ::setrlimit(RLIMIT_NOFILE, &limit);
+    }
 }
 
 }  // namespace lookhaven::base

@@ -17,13 +17,19 @@ struct ProcessIdentity {
     bool operator==(const ProcessIdentity&) const = default;
 };
 
-// The start time of the process, or 0 when it does not exist (a zombie counts as gone).
+constexpr std::uint64_t kUnknownStart = ~std::uint64_t{0};
+
+// The start time of the process, 0 when it does not exist (a zombie counts as gone), or kUnknownStart when the system
+// does not say, as when descriptors have run out.
 std::uint64_t ProcessStartTicks(pid_t pid);
 
-// The calling process; read anew after a fork.
+// The calling process; read anew after a fork. Throws std::runtime_error when its start time cannot be had.
 ProcessIdentity ThisProcess();
 
-// False once that very process is gone.
+// False once that very process is certainly gone: what it holds may be taken away then.
 bool IsAlive(const ProcessIdentity& process);
+
+// Lets the calling process open as many descriptors as the system ever grants it.
+void RaiseDescriptorLimit();
 
 }  // namespace lookhaven::base

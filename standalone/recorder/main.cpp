@@ -13,6 +13,7 @@
 
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
+#include "standalone/base/process.h"
 #include "standalone/recorder/instance_lock.h"
 #include "standalone/recorder/supervisor.h"
 
@@ -20,7 +21,8 @@ namespace {
 
 using namespace lookhaven;
 
-constexpr std::chrono::milliseconds kFinishLimit{1'500};
+// A signal that comes just before the supervisor's wait costs the whole second of it; both must fit into two seconds.
+constexpr std::chrono::milliseconds kFinishLimit{800};
 
 volatile std::sig_atomic_t g_stop = 0;
 
@@ -35,6 +37,7 @@ void StopOnSignals() {
 void RunUntilStopped(const base::Installation& installation, std::chrono::milliseconds no_data_limit) {
     const recorder::InstanceLock lock(installation);
     StopOnSignals();
+    base::RaiseDescriptorLimit();  // each camera costs several
     recorder::Supervisor supervisor(installation, no_data_limit);
     base::LogInfo("started for " + installation.Home().string());
     while (g_stop == 0) {

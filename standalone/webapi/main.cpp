@@ -8,11 +8,11 @@
 #include <vector>
 
 #include <CLI/CLI.hpp>
-#include <sys/resource.h>
 #include <sysexits.h>
 
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
+#include "standalone/base/process.h"
 #include "standalone/webapi/listener.h"
 #include "standalone/webapi/modules.h"
 #include "standalone/webapi/server.h"
@@ -51,15 +51,6 @@ void Describe(CLI::App& app, Options& options) {
     AddMillis(app, "--leave-seconds", options.limits.processes.leave, "for a process that was told to end");
 }
 
-// Each running request costs the host two descriptors.
-void RaiseDescriptorLimit() {
-    rlimit limit{};
-    if (::getrlimit(RLIMIT_NOFILE, &limit) == 0) {
-        limit.rlim_cur = limit.rlim_max;
-        ::setrlimit(RLIMIT_NOFILE, &limit);
-    }
-}
-
 void Run(const Options& options) {
     const base::Installation installation =
         options.home.empty() ? base::Installation::FromEnvironment() : base::Installation(options.home);
@@ -67,7 +58,7 @@ void Run(const Options& options) {
     for (const std::string& module : options.modules) {
         modules.Load(module);
     }
-    RaiseDescriptorLimit();
+    base::RaiseDescriptorLimit();  // each running request costs the host two
     webapi::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                      : std::filesystem::path(options.socket));
     webapi::Server server(installation, modules, listener.TakeSocket(), options.limits);

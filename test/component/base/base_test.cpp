@@ -7,6 +7,7 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -47,6 +48,22 @@ TEST(ProcessIdentityTest, ADeadProcessIsGoneEvenAsAZombieAndWhenItsIdIsReused) {
     EXPECT_FALSE(IsAlive(identity)) << "a zombie holds nothing any more";
     ::waitpid(child, nullptr, 0);
     EXPECT_FALSE(IsAlive(identity));
+}
+
+TEST(ProcessIdentityTest, AProcessThatCannotBeLookedUpForWantOfDescriptorsIsNotDead) {
+    const ProcessIdentity self = ThisProcess();
+    rlimit before{};
+    ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+    const rlimit none{0, before.rlim_max};
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
+    const bool alive = IsAlive(self);
+    EXPECT_THROW(ThisProcess(), std::runtime_error) << "nobody could tell whether such an owner lives";
+    RaiseDescriptorLimit();
+    rlimit raised{};
+    ::getrlimit(RLIMIT_NOFILE, &raised);
+    ::setrlimit(RLIMIT_NOFILE, &before);
+    EXPECT_TRUE(alive);
+    EXPECT_EQ(raised.rlim_cur, raised.rlim_max);
 }
 
 TEST(ProcessIdentityTest, ACommandNameWithParenthesesAndSpacesDoesNotShiftTheFields) {
