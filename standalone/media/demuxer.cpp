@@ -212,7 +212,7 @@ bool Demuxer::LearnFormat(std::span<const std::uint8_t> frame) {
     int parsed_size = 0;
     av_parser_parse2(parser_.get(), parser_codec_.get(), &parsed, &parsed_size, frame.data(),
                      static_cast<int>(frame.size()), AV_NOPTS_VALUE, AV_NOPTS_VALUE, 0);
-    if (parser_->width <= 0 || parser_->height <= 0) {
+    if (!PictureSize{parser_->width, parser_->height}.IsUsable()) {
         return false;
     }
     video_.width = parser_->width;

@@ -16,7 +16,8 @@ std::optional<PictureSize> JpegSize(std::span<const std::uint8_t> jpeg) {
         }
         // A frame header is any of SOF0 … SOF15 but for the three numbers that mean tables.
         if (marker >= 0xc0 && marker <= 0xcf && marker != 0xc4 && marker != 0xc8 && marker != 0xcc) {
-            return PictureSize{word(at + 7), word(at + 5)};
+            const PictureSize size{word(at + 7), word(at + 5)};
+            return size.IsUsable() ? std::optional(size) : std::nullopt;
         }
         at += 2 + static_cast<std::size_t>(word(at + 2));
     }

@@ -222,6 +222,13 @@ TEST(JpegSize, ReadsHeadersOfAnyKind) {
         << "fill bytes, progressive";
     EXPECT_EQ(size_of(std::string("\xff\xd8\xff\xe0\0\0\xff\xe0\0\0\0\0\0\0", 14)), "none") << "lengths of nothing";
     EXPECT_EQ(size_of("GIF89a and more"), "none");
+    const std::pair<std::string, const char*> bounds[] = {
+        {std::string("\x20\0\x20\0", 4), "8192x8192"}, {std::string("\x20\1\0\1", 4), "none"},
+        {std::string("\0\1\x20\1", 4), "none"},        {std::string("\0\0\0\1", 4), "none"},
+        {std::string("\0\1\0\0", 4), "none"},          {"\xff\xff\xff\xff", "none"}};
+    for (const auto& [size, expected] : bounds) {
+        EXPECT_EQ(size_of("\xff\xd8\xff\xc0" + std::string("\0\x11\x08", 3) + size), expected);
+    }
 }
 
 TEST(Timeline, FollowsTheSourceAndSurvivesItsJumps) {
