@@ -7,6 +7,7 @@
 
 #include <turbojpeg.h>
 
+#include "standalone/media/jpeg.h"
 #include "standalone/media/libav.h"
 #include "standalone/media/source.h"
 
@@ -36,6 +37,7 @@ AvPtr<AVFrame> Decode(Codec codec, std::span<const std::uint8_t> bytes) {
     }
     const AvPtr<AVCodecContext> context = OwnAv(avcodec_alloc_context3(decoder));
     context->thread_count = 1;
+    context->max_pixels = std::int64_t{kMaxSidePixels} * kMaxSidePixels;
     CheckAv(avcodec_open2(context.get(), decoder, nullptr), "cannot open the decoder");
     const AvPtr<AVPacket> packet = OwnAv(av_packet_alloc());
     CheckAv(av_new_packet(packet.get(), static_cast<int>(bytes.size())), "cannot hold the frame");
