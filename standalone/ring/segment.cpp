@@ -99,6 +99,16 @@ Attachment Finish(Attachment attachment, std::uint64_t installation, const Strea
     return attachment;
 }
 
+// Counts go up by one from 1, so none comes near the end of its range, where the arithmetic with them would wrap.
+bool HasPossibleCounts(const View& view) {
+    constexpr std::uint64_t kImpossible = std::uint64_t{1} << 62;
+    std::uint64_t highest = view.Head().newest.load();
+    for (std::uint32_t i = 0; i < view.Head().index_slots; ++i) {
+        highest = std::max(highest, view.Slot(i).count.load());
+    }
+    return highest < kImpossible;
+}
+
 }  // namespace
 
 std::span<ReaderSlot> View::Readers() const {
@@ -183,7 +193,8 @@ SegmentCheck CheckSegment(const void* address, std::uint64_t real_bytes) {
     }
     const bool whole = head.segment_bytes == real_bytes && head.reader_slots == kReaderSlots && head.index_slots >= 2 &&
                        head.index_slots <= kLastSequence && head.extra_length <= kMaxExtraBytes &&
-                       head.codec[kMaxCodecLength] == '\0' && SegmentBytes(View(address).Size()) == real_bytes;
+                       head.codec[kMaxCodecLength] == '\0' && SegmentBytes(View(address).Size()) == real_bytes &&
+                       HasPossibleCounts(View(address));
     return whole ? SegmentCheck::kGood : SegmentCheck::kDamaged;
 }
 
