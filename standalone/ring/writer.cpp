@@ -103,7 +103,11 @@ void Writer::Ring::Open() {
 bool Writer::Ring::Adopt(FoundSegment& found) {
     if (found.check != SegmentCheck::kGood) {
         base::LogWarning("ring of " + Name(id_) + " has another layout or is damaged: replaced");
-        found.attachment.RemoveSegment();
+        if (found.check == SegmentCheck::kDamaged) {
+            Retire(found.attachment);  // its viewers are told to come again
+        } else {
+            found.attachment.RemoveSegment();  // where another layout says it is retired is not known
+        }
         return false;
     }
     SegmentHead& head = View(found.attachment.Address()).Head();

@@ -213,6 +213,31 @@ TEST_F(LifecycleTest, ForeignSegmentsAreRefusedAndReplaced) {
     }
 }
 
+TEST_F(LifecycleTest, ADamagedRingIsReplacedAndItsViewersAreTold) {
+    struct Row {
+        const char* name;
+        void (*damage)(const View&);
+    };
+    for (const Row& row : {
+             Row{"another size", [](const View& view) { view.Head().segment_bytes += 1; }},
+             Row{"a newest count at the end of its range", [](const View& view) { view.Head().newest = ~0ULL; }},
+             Row{"an index count at the end of its range", [](const View& view) { view.Slot(63).count = ~0ULL; }},
+         }) {
+        SCOPED_TRACE(row.name);
+        KilledChild recorder = OtherRecorder();
+        void* ring = Attach(installation_, kId);
+        ASSERT_NE(ring, nullptr);
+        recorder.Kill();
+        row.damage(View(ring));
+        Writer writer = MakeWriter();
+        EXPECT_TRUE(IsRetired(ring));
+        if (IsRetired(ring)) {
+            Write(writer, 100);
+        }
+        Detach(ring);
+    }
+}
+
 TEST_F(LifecycleTest, AnotherStreamsSegmentUnderTheSameKeyIsLeftAlone) {
     key_t key = 0;
     {
