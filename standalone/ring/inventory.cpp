@@ -98,7 +98,8 @@ std::size_t RemoveOrphans(const base::Installation& installation) {
             ++removed;
         }
     });
-    ForEachRingKey([&](int shm_id, const shmid_ds&) { removed += RemoveIfAbandoned(shm_id) ? 1 : 0; });
+    ForEachRingKey(
+        [&](int shm_id, const shmid_ds&) { removed += RemoveIfAbandoned(installation.Id(), shm_id) ? 1 : 0; });
     return removed;
 }
 

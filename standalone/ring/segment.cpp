@@ -18,7 +18,8 @@ namespace lookhaven::ring {
 namespace {
 
 constexpr std::uint32_t kKeyMark = 0x4c000000;
-constexpr int kProbes = 8;  // keys that one stream may have, tried in turn when others' segments collide
+constexpr int kMode = 0600;  // rings are the service account's alone
+constexpr int kProbes = 8;   // keys that one stream may have, tried in turn when others' segments collide
 
 constexpr std::uint64_t kReadersOffset = (sizeof(SegmentHead) + 63) / 64 * 64;
 constexpr std::uint64_t kIndexOffset = kReadersOffset + kReaderSlots * sizeof(ReaderSlot);
@@ -59,10 +60,11 @@ std::optional<Attachment> OpenKey(key_t key) {
 
 void FillHead(SegmentHead& head, std::uint64_t installation, const StreamId& id, const StreamFormat& format,
               const Geometry& geometry) {
+    head.installation = installation;
+    std::atomic_signal_fence(std::memory_order_seq_cst);  // whoever dies from here on leaves a head that says whose
     head.layout_version = kLayoutVersion;
     head.generation = static_cast<std::uint32_t>(base::MonotonicMicros());
     head.segment_bytes = SegmentBytes(geometry);
-    head.installation = installation;
     head.camera = id.camera;
     head.stream = id.stream;
     head.medium = static_cast<std::int32_t>(id.medium);
@@ -107,6 +109,13 @@ bool HasPossibleCounts(const View& view) {
         highest = std::max(highest, view.Slot(i).count.load());
     }
     return highest < kImpossible;
+}
+
+// Other programs may have segments under keys like ours. One of ours is all zeros or says whose it is.
+bool MayBeOurs(const SegmentHead& head, std::uint64_t installation) {
+    const std::span bytes(reinterpret_cast<const unsigned char*>(&head), sizeof head);
+    return head.installation == installation ||
+           std::ranges::all_of(bytes, [](unsigned char byte) { return byte == 0; });
 }
 
 }  // namespace
@@ -206,15 +215,16 @@ bool IsRingKey(key_t key) {
     return (static_cast<std::uint32_t>(key) & 0xff000000) == kKeyMark;
 }
 
-bool RemoveIfAbandoned(int shm_id) {
+bool RemoveIfAbandoned(std::uint64_t installation, int shm_id) {
     shmid_ds status{};
-    if (::shmctl(shm_id, IPC_STAT, &status) != 0 || status.shm_nattch != 0 ||
+    if (::shmctl(shm_id, IPC_STAT, &status) != 0 || status.shm_nattch != 0 || (status.shm_perm.mode & 0777) != kMode ||
         base::ProcessStartTicks(status.shm_cpid) != 0) {
         return false;
     }
     try {
         const Attachment attachment(shm_id);
-        if (CheckSegment(attachment.Address(), status.shm_segsz) != SegmentCheck::kUnfinished) {
+        if (CheckSegment(attachment.Address(), status.shm_segsz) != SegmentCheck::kUnfinished ||
+            !MayBeOurs(View(attachment.Address()).Head(), installation)) {
             return false;
         }
         attachment.RemoveSegment();
@@ -248,9 +258,9 @@ Attachment CreateSegment(std::uint64_t installation, const StreamId& id, const S
     for (int probe = 0; probe < kProbes; ++probe) {
         const key_t key = KeyOf(installation, id, probe);
         if (const int left_over = ::shmget(key, 0, 0); left_over >= 0) {
-            RemoveIfAbandoned(left_over);
+            RemoveIfAbandoned(installation, left_over);
         }
-        const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | 0600);
+        const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | kMode);
         if (shm_id >= 0) {
             return Finish(AttachNew(shm_id), installation, id, format, geometry);
         }

@@ -156,8 +156,9 @@ std::uint64_t SegmentBytes(const Geometry& geometry);
 // Keys of this system's segments share their highest byte.
 bool IsRingKey(key_t key);
 
-// Removes the segment if its creator was killed before the magic was written: nobody else ever would.
-bool RemoveIfAbandoned(int shm_id);
+// Removes the segment, which has a ring key, if its creator was killed before the magic was written: nobody else ever
+// would. What may be another program's or another installation's stays.
+bool RemoveIfAbandoned(std::uint64_t installation, int shm_id);
 
 // A segment with the stream's identity, as found; a retired one is passed over.
 struct FoundSegment {
