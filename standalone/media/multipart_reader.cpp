@@ -18,6 +18,7 @@ namespace {
 constexpr std::size_t kBufferBytes = 65536;
 constexpr std::size_t kMaxLineBytes = 4096;
 constexpr int kMaxHeadLines = 64;
+constexpr std::uint8_t kFirstOfPicture = 0xff;
 
 }  // namespace
 
@@ -55,12 +56,18 @@ std::span<const std::uint8_t> MultipartReader::Next() {
     }
 }
 
-std::uint8_t MultipartReader::ReadByte() {
+std::uint8_t MultipartReader::Peek() {
     if (begin_ == end_) {
         begin_ = 0;
         end_ = input_(buffer_);
     }
-    return buffer_[begin_++];
+    return buffer_[begin_];
+}
+
+std::uint8_t MultipartReader::ReadByte() {
+    const std::uint8_t byte = Peek();
+    ++begin_;
+    return byte;
 }
 
 std::string MultipartReader::ReadLine() {
@@ -83,8 +90,12 @@ void MultipartReader::SkipToBoundary() {
         return;
     }
     for (int lines = 0; lines < kMaxHeadLines; ++lines) {
-        const std::string line = ReadLine();
+        std::string line = ReadLine();
         if (line == delimiter_) {
+            return;
+        }
+        if (line == "--" + delimiter_) {
+            delimiter_ = std::move(line);  // the dashes belonged to the boundary's name after all
             return;
         }
         if (line == delimiter_ + "--") {
@@ -94,15 +105,18 @@ void MultipartReader::SkipToBoundary() {
     throw SourceError("sends no multipart answer");
 }
 
-// The part's length, or 0 when its head does not say it.
+// The part's length, or 0 when its head does not say it. Some cameras send blank lines before the head; a part that has
+// no head goes on with a picture, which begins with no letter.
 std::size_t MultipartReader::ReadHead() {
     constexpr std::string_view kLength = "content-length:";
     std::size_t size = 0;
+    bool has_fields = false;
     for (int lines = 0; lines < kMaxHeadLines; ++lines) {
         const std::string line = ReadLine();
-        if (line.empty()) {
+        if (line.empty() && (has_fields || Peek() == kFirstOfPicture)) {
             return size;
         }
+        has_fields |= !line.empty();
         if (line.size() > kLength.size() && strncasecmp(line.data(), kLength.data(), kLength.size()) == 0) {
             const std::size_t digits = line.find_first_not_of(" \t", kLength.size());
             std::from_chars(line.data() + digits, line.data() + line.size(), size);

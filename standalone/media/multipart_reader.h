@@ -31,6 +31,7 @@ class MultipartReader {
     std::span<const std::uint8_t> Next();
 
   private:
+    std::uint8_t Peek();
     std::uint8_t ReadByte();
     std::string ReadLine();
     void SkipToBoundary();
