@@ -54,13 +54,15 @@ void StreamWorker::Run(const std::stop_token& stop) {
 
 // Leaves by an exception only.
 void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
-    live_since_us_ = 0;
+    bool live = false;
     const std::unique_ptr<media::Source> source = media::OpenSource(plan_.url, options_, stop);
     for (;;) {
         const media::Packet packet = source->Next();
         rings.Write(packet, source->Audio());
-        if (live_since_us_ == 0) {
-            live_since_us_ = base::MonotonicMicros();
+        if (packet.medium == media::Medium::kVideo) {
+            backoff_.NotePicture(base::MonotonicMicros());
+        }
+        if (!std::exchange(live, true)) {
             ReportLive(*packet.format, source->Audio());
         }
     }
@@ -69,9 +71,7 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
 void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& stop) {
     constexpr std::int64_t kBeatUs = 1'000'000;
     const std::int64_t now_us = base::MonotonicMicros();
-    const std::chrono::microseconds flowed(live_since_us_ == 0 ? 0 : now_us - live_since_us_);
-    const std::chrono::microseconds wait =
-        backoff_.AfterFailure(std::chrono::duration_cast<std::chrono::milliseconds>(flowed));
+    const std::chrono::microseconds wait = backoff_.AfterFailure();
     const std::int64_t end_us = now_us + wait.count();
     for (std::int64_t step_us = now_us; step_us < end_us;) {
         rings.Beat();

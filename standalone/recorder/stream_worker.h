@@ -54,8 +54,7 @@ class StreamWorker {
     const StreamPlan plan_;
     const media::SourceOptions options_;
     Backoff backoff_;
-    std::int64_t live_since_us_ = 0;  // 0: not live
-    std::string reported_failure_;    // empty when the last report was another
+    std::string reported_failure_;  // empty when the last report was another
     std::atomic<bool> has_ended_ = false;
     std::jthread thread_;  // last: it uses the others
 };

@@ -257,14 +257,21 @@ TEST(Backoff, GrowsToItsCapAndBeginsAnewAfterStableFlow) {
     using recorder::Backoff;
     for (std::uint32_t seed = 0; seed < 50; ++seed) {
         Backoff backoff(seed);
+        std::int64_t now_us = 0;
         std::chrono::milliseconds longest = Backoff::kFirst;
         for (int failure = 0; failure < 12; ++failure) {
-            const auto wait = backoff.AfterFailure(std::chrono::milliseconds(failure % 2 == 0 ? 0 : 9'000));
+            // None, one, or two with nine seconds between them.
+            for (int picture = 0; picture < failure % 3; ++picture) {
+                backoff.NotePicture(now_us += 9'000'000);
+            }
+            const auto wait = backoff.AfterFailure();
             EXPECT_LE(wait, longest);
             EXPECT_GE(wait, longest / 2);
             longest = std::min<std::chrono::milliseconds>(longest * 2, std::chrono::seconds(30));
         }
-        EXPECT_LE(backoff.AfterFailure(Backoff::kStable), Backoff::kFirst);
+        backoff.NotePicture(now_us);
+        backoff.NotePicture(now_us + std::chrono::microseconds(Backoff::kStable).count());
+        EXPECT_LE(backoff.AfterFailure(), Backoff::kFirst);
     }
 }
 
