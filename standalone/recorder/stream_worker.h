@@ -25,7 +25,8 @@ struct StreamPlan {
     std::string url;
     media::Credentials credentials;
 
-    bool operator==(const StreamPlan&) const = default;
+    // A renamed camera streams on as it is.
+    bool HasSourceOf(const StreamPlan& other) const { return url == other.url && credentials == other.credentials; }
 };
 
 class StreamWorker {

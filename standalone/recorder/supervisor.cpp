@@ -85,7 +85,7 @@ void Supervisor::Reconcile() {
     some_end_ = false;
     for (const auto& [stream, worker] : workers_) {
         const auto plan = plans.find(stream);
-        if (plan == plans.end() || plan->second != worker->Plan()) {
+        if (plan == plans.end() || !plan->second.HasSourceOf(worker->Plan())) {
             worker->RequestStop();
             some_end_ = true;
         }

@@ -143,12 +143,14 @@ TEST_F(RecorderTest, ChangesOfACameraTouchThatCameraAlone) {
     Viewer other_viewer(*installation_, other);
     viewer.Next();
     other_viewer.Next();
+    ChangeCamera(other, [](store::Camera& camera) { camera.name = "Renamed"; });
     ChangeCamera(changed, [](store::Camera& camera) { camera.profiles[0].source = "test:mjpeg?size=320x240"; });
     ASSERT_TRUE(Eventually([&] { return viewer.Next(), ring::Width(viewer.Ring()) == 320; }));
     ChangeCamera(changed, [](store::Camera& camera) { camera.enabled = false; });
     EXPECT_TRUE(Eventually([&] { return !viewer.HasPicture() && Segments() == 1; }));
     other_viewer.Next();
     EXPECT_EQ(LogLines("camera " + std::to_string(other) + " \"Camera\" stream 0: live"), 1u);
+    EXPECT_EQ(LogLines("Renamed"), 0u) << "a name cuts the stream";
 }
 
 TEST_F(RecorderTest, WaitsForTheStore) {
