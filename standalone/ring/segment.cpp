@@ -92,6 +92,24 @@ Attachment AttachNew(int shm_id) {
     }
 }
 
+// A segment of zeros under one of the keys that the installation has for the stream.
+Attachment MakeUnderKey(std::uint64_t installation, const StreamId& id, const Geometry& geometry) {
+    for (int probe = 0; probe < kProbes; ++probe) {
+        const key_t key = KeyOf(installation, id, probe);
+        if (const int left_over = ::shmget(key, 0, 0); left_over >= 0) {
+            RemoveIfAbandoned(installation, left_over);
+        }
+        const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | kMode);
+        if (shm_id >= 0) {
+            return AttachNew(shm_id);
+        }
+        if (errno != EEXIST) {
+            break;
+        }
+    }
+    base::ThrowErrno("cannot make a ring of " + std::to_string(SegmentBytes(geometry)) + " bytes of shared memory");
+}
+
 // Fresh shared memory is zeros, which is what every slot begins with.
 Attachment Finish(Attachment attachment, std::uint64_t installation, const StreamId& id, const StreamFormat& format,
                   const Geometry& geometry) {
@@ -255,28 +273,15 @@ std::optional<FoundSegment> FindSegment(std::uint64_t installation, const Stream
 
 Attachment CreateSegment(std::uint64_t installation, const StreamId& id, const StreamFormat& format,
                          const Geometry& geometry) {
-    for (int probe = 0; probe < kProbes; ++probe) {
-        const key_t key = KeyOf(installation, id, probe);
-        if (const int left_over = ::shmget(key, 0, 0); left_over >= 0) {
-            RemoveIfAbandoned(installation, left_over);
-        }
-        const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | kMode);
-        if (shm_id >= 0) {
-            return Finish(AttachNew(shm_id), installation, id, format, geometry);
-        }
-        if (errno != EEXIST) {
-            break;
-        }
-    }
-    base::ThrowErrno("cannot make a ring of " + std::to_string(SegmentBytes(geometry)) + " bytes of shared memory");
+    return Finish(MakeUnderKey(installation, id, geometry), installation, id, format, geometry);
 }
 
 Attachment CreatePrivateSegment(const StreamId& id, const StreamFormat& format, const Geometry& geometry) {
-    const int shm_id = ::shmget(IPC_PRIVATE, SegmentBytes(geometry), IPC_CREAT | 0600);
-    if (shm_id < 0) {
-        base::ThrowErrno("cannot make a ring of shared memory");
-    }
-    Attachment attachment = AttachNew(shm_id);
+    // Under a key until it is attached, so that the sweep finds it if this process is killed in between. Each process
+    // and time has keys of its own.
+    const std::uint64_t one_time =
+        OwnWord() * 0x9e3779b97f4a7c15ULL ^ static_cast<std::uint64_t>(base::MonotonicMicros());
+    Attachment attachment = MakeUnderKey(one_time, id, geometry);
     attachment.RemoveSegment();
     return Finish(std::move(attachment), 0, id, format, geometry);
 }

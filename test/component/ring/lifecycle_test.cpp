@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // How segments come, change hands and go: adoption, retirement, killed readers and writers, foreign segments, orphans.
-#include <cstddef>
-#include <cstring>
 #include <new>
 #include <stdexcept>
 
@@ -280,37 +278,6 @@ TEST_F(LifecycleTest, OnlyOrphansAreRemoved) {
     EXPECT_EQ(left[0].id, other);
     EXPECT_TRUE(left[0].writer_alive);
     EXPECT_EQ(left[0].attached, 1U);
-}
-
-TEST_F(LifecycleTest, OnlyUnfinishedSegmentsOfOursAreRemoved) {
-    constexpr key_t kUnusedRingKey = 0x4c123457;
-    ASSERT_TRUE(IsRingKey(kUnusedRingKey));
-    struct Row {
-        const char* name;
-        int mode;
-        std::size_t written_offset;
-        std::uint64_t written;
-        bool is_removed;
-    };
-    for (const Row& row : {
-             Row{"killed before the first byte", 0600, 0, 0, true},
-             Row{"killed in the head", 0600, offsetof(SegmentHead, installation), installation_.Id(), true},
-             Row{"of another installation", 0600, offsetof(SegmentHead, installation), ~installation_.Id(), false},
-             Row{"another program's data", 0600, 512, 1, false},
-             Row{"shared with other users", 0660, 0, 0, false},
-         }) {
-        SCOPED_TRACE(row.name);
-        KilledChild creator([&] {
-            const Attachment made(::shmget(kUnusedRingKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | row.mode));
-            std::memcpy(static_cast<char*>(made.Address()) + row.written_offset, &row.written, sizeof row.written);
-        });
-        EXPECT_EQ(RemoveOrphans(installation_), 0U) << "its creator lives";
-        creator.Kill();
-        EXPECT_EQ(RemoveOrphans(installation_), row.is_removed ? 1U : 0U);
-        const int left = ::shmget(kUnusedRingKey, 0, 0);
-        EXPECT_EQ(left >= 0, !row.is_removed);
-        ::shmctl(left, IPC_RMID, nullptr);
-    }
 }
 
 TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
