@@ -6,12 +6,20 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
+#include "standalone/media/jpeg.h"
 #include "standalone/media/source.h"
 #include "standalone/media/source_url.h"
+
+extern "C" {
+#include <libavutil/mem.h>
+}
 
 namespace lookhaven::media {
 
 namespace {
+
+// Twice the samples of a plane, for what stands around them.
+constexpr std::size_t kMaxBlockBytes = std::size_t{2} * kMaxSidePixels * kMaxSidePixels;
 
 void WriteAvLog(void* object, int level, const char* format, va_list arguments) {
     if (level > AV_LOG_WARNING) {
@@ -34,9 +42,12 @@ int CheckAv(int result, std::string_view what) {
     return result;
 }
 
-void RedirectAvLog() {
+void PrepareAv() {
     static std::once_flag once;
-    std::call_once(once, [] { av_log_set_callback(WriteAvLog); });
+    std::call_once(once, [] {
+        av_log_set_callback(WriteAvLog);
+        av_max_alloc(kMaxBlockBytes);
+    });
 }
 
 Deadline::Deadline(std::stop_token stop, std::chrono::milliseconds limit)

@@ -61,8 +61,9 @@ AvPtr<T> OwnAv(T* object) {
 }
 
 // Sends libav's log lines to ours, at debug level and with secrets taken out: whatever matters comes back as an error
-// too, and a broken camera would fill the log with a line per frame. Does its work once per process.
-void RedirectAvLog();
+// too, and a broken camera would fill the log with a line per frame. Refuses libav any single block of memory that no
+// picture of kMaxSidePixels needs, whatever a camera claims. Does its work once per process.
+void PrepareAv();
 
 // Ends a blocking libav call at a stop request or when no picture came for too long.
 //

@@ -53,7 +53,7 @@ const char* CodecName(Codec codec) {
 }
 
 std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop) {
-    RedirectAvLog();
+    PrepareAv();
     const base::BlockedSignals blocked;  // for the threads that libav may start
     return Open(url, options, std::move(stop));
 }

@@ -89,7 +89,7 @@ std::vector<std::uint8_t> Compress(const Rgb& rgb) {
 }  // namespace
 
 std::vector<std::uint8_t> JpegOfKeyFrame(Codec codec, std::span<const std::uint8_t> frame) {
-    RedirectAvLog();
+    PrepareAv();
     return Compress(Convert(*Decode(codec, frame)));
 }
 
