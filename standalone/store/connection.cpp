@@ -18,6 +18,19 @@ constexpr std::string_view kPostgresqlPrefix = "postgresql:";
 // How long a writer waits for another one.
 constexpr const char* kBusyTimeoutS = "5";
 
+// A server that is away or hangs must not hold up the recorder or a request for minutes. What the address itself says
+// about connecting goes first.
+std::string WithTimeouts(std::string location) {
+    const bool is_url = location.starts_with("postgresql://");
+    for (const std::string limit : {"connect_timeout=2", "tcp_user_timeout=5000"}) {
+        if (location.find(limit.substr(0, limit.find('=') + 1)) == std::string::npos) {
+            location += !is_url ? " " : location.find('?') == std::string::npos ? "?" : "&";
+            location += limit;
+        }
+    }
+    return location;
+}
+
 }  // namespace
 
 StoreAddress StoreAddress::Parse(const std::string& url) {
@@ -43,7 +56,8 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
             session_.open(soci::sqlite3, "db=\"" + address.location + "\" timeout=" + kBusyTimeoutS);
             session_ << "pragma foreign_keys = on";
         } else {
-            session_.open(soci::postgresql, address.location);
+            session_.open(soci::postgresql, WithTimeouts(address.location));
+            session_ << "set statement_timeout = '5s'";
         }
     } catch (const soci::soci_error& error) {
         throw StoreError("cannot open the record store: " + error.get_error_message());
