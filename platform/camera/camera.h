@@ -40,6 +40,8 @@ class LH_PLATFORM_API Camera {
     CAM_PROFILE_TYPE GetLiveProfile() const;
     // The number of the live stream that carries the profile. A profile that the camera lacks gives the live profile's.
     int GetUiStreamNo(CAM_PROFILE_TYPE profile) const;
+    // The folder that holds the camera's recordings and recording log; empty when it has none.
+    std::string GetStoragePath() const;
 
     int m_Id;
     char m_szName[CAM_NAME_SIZE];  // UTF-8, NUL-terminated
@@ -49,6 +51,7 @@ class LH_PLATFORM_API Camera {
     int m_StreamNo[CAM_PROFILE_COUNT];
     bool m_blPtz;    // the camera moves
     bool m_blAudio;  // the camera hears
+    std::string m_StoragePath;
 };
 
 // The cameras of this host in list order. deniedIds: ids to leave out, decimal, ascending, joined by ",". groupIds:

@@ -37,6 +37,8 @@ class LH_PLATFORM_API PrivProfile {
     // The ids of cameras to which the user lacks the kind of access. withHidden: also those that the user's lists hide
     // although they exist (cameras of removed groups).
     std::set<int> GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const;
+    // The ids of camera groups to which the user lacks the kind of access (a CAM_PRIV_TYPE).
+    std::set<int> GetInaPrivPerCamGrpIdSet(int type) const;
     // Narrows the profile by the rights that a relaying host sends along; null changes nothing. Never widens it.
     void UpdateByJson(const Json::Value& privData);
 
