@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Accounts: who may log in, how much they may do, which cameras are denied to them.
+// Accounts: who may log in, how much they may do, which cameras and groups are denied to them.
 #pragma once
 
 #include <initializer_list>
@@ -19,7 +19,7 @@ constexpr int kPeerUserId = 1024;
 
 enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
 
-// What a user may be denied at a camera; the numbers are stored.
+// What a user may be denied at a camera or a group of them; the numbers are stored.
 enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8 };
 constexpr std::initializer_list<CameraAccess> kEveryAccess = {CameraAccess::kLive, CameraAccess::kPlayback,
                                                               CameraAccess::kAudio};
@@ -38,6 +38,7 @@ struct VerifiedUser : User {
 };
 
 // Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
+//                   So does one of a group that is denied.
 //               (2) Names are told apart without regard to case, and "Lookhaven" is nobody's name.
 class Users {
   public:
@@ -59,10 +60,14 @@ class Users {
     void SetPassword(int id, std::string_view password);
     void Deny(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
+    void DenyGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
+    void AllowGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void Remove(int id);
 
-    // The cameras at which the user lacks that access; empty for an unknown user.
+    // The cameras at which the user lacks that access, by themselves or as members of a denied group; empty for an
+    // unknown user.
     std::set<int> DeniedCameras(int id, CameraAccess kind);
+    std::set<int> DeniedGroups(int id, CameraAccess kind);
 
   private:
     Connection& connection_;

@@ -1,0 +1,117 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Recorded events: a row for each file of a camera's recording.
+//
+// Why so        The file is the record, the row is how it is found. So a row is made after its file exists and removed
+//               before the file goes: a row never points at nothing. There is no row per frame.
+// Invariants    (1) begins before it ends, and at most kMaxEventSeconds later: what touches a span of time is found by
+//                   looking at a bounded stretch of the index (camera, start), however many events there are.
+//               (2) Ids come from one counter with those of marks and are never used twice.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <limits>
+#include <optional>
+#include <set>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "standalone/store/cameras.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+constexpr std::int64_t kMaxEventSeconds = 7200;
+
+// Why it was recorded; the numbers are stored, and go to clients.
+constexpr int kReasonContinuous = 1;
+constexpr int kReasonAlarm = 3;
+
+struct Event {
+    int id = 0;
+    int camera_id = 0;
+    int mount_id = 0;
+    std::int64_t start_s = 0;
+    std::int64_t end_s = 0;  // of an event that grows, its last second on the mount
+    bool recording = false;  // still being written
+    int reason = kReasonContinuous;
+    int frame_count = 0;
+    std::int64_t size_bytes = 0;
+    VideoType video_type = VideoType::kMjpeg;
+    std::string audio_codec;  // empty when silent
+    int width = 0;
+    int height = 0;
+    std::string path;       // relative to the mount
+    bool archived = false;  // retention leaves it alone
+    bool demo = false;      // made up for a trial: there is no file
+};
+
+// Which events to read; a fresh one names those of no camera.
+struct EventFilter {
+    std::set<int> camera_ids;
+    int mount_id = 0;                                               // 0: any
+    std::int64_t begin_s = 0;                                       // events that touch the span from here …
+    std::int64_t end_s = std::numeric_limits<std::int64_t>::max();  // … up to, not including, here
+    int reason = 0;                                                 // 0: any
+    bool finished_only = false;
+    bool newest_first = false;
+    int offset = 0;
+    int limit = std::numeric_limits<int>::max();
+};
+
+// What lies on a mount, trials left out.
+struct MountContent {
+    std::int64_t events = 0;
+    std::int64_t size_bytes = 0;
+};
+
+class Events {
+  public:
+    using Visitor = std::function<void(const Event&)>;
+
+    // The store must outlive this object.
+    explicit Events(Store& store) : connection_(store.connection()) {}
+
+    // The id of an event or mark to come; one that is not used is lost.
+    int NextId();
+
+    // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.
+    void Begin(const Event& event);
+    // Stores finished rows under ids of their own, in one transaction.
+    void AddAll(std::span<const Event> events);
+    // The event goes on. end_s: its last second on the mount. These three are false when there is no such row, and throw
+    // InvalidRecord where the event would end before it starts or become too long.
+    bool Grow(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
+    bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
+    bool SetArchived(int id, bool archived);
+
+    // The number of rows removed; the caller then removes the files.
+    int Remove(std::span<const int> ids);
+    // Removes all events and marks that were made up for a trial; returns how many.
+    int RemoveDemo();
+
+    std::optional<Event> Find(int id);
+    // By start and id, over all of the filter's cameras.
+    std::vector<Event> List(const EventFilter& filter);
+    // The same rows without offset and limit, camera by camera, as they come from the store: nothing is collected. The
+    // event is borrowed for the call, and the visitor must not use this store.
+    void Visit(const EventFilter& filter, const Visitor& visitor);
+
+    // Those that are still marked as being written; after a crash, what has to be closed. By id.
+    std::vector<Event> Open();
+    // Finished events of the mount that are neither archived nor a trial's, the oldest start first.
+    std::vector<Event> Oldest(int mount_id, int limit);
+    // Every row of the mount but a trial's, by camera and id. As Visit.
+    void VisitMount(int mount_id, const Visitor& visitor);
+    // Takes time in proportion to the mount's events: a tenth of a second for a million.
+    MountContent Content(int mount_id);
+    // The cameras, removed ones too, that have events on the mount; mount 0: on any.
+    std::set<int> CamerasOn(int mount_id);
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store

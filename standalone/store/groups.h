@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Camera groups. What is denied of a group to a user stands in users.h.
+#pragma once
+
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+struct CameraGroup {
+    int id = 0;                // from 1, never used twice
+    std::string name;          // UTF-8, 1 to 64 bytes, no other group's
+    std::set<int> camera_ids;  // those that were removed stay, for their recordings do
+};
+
+// Invariants    (1) Every change raises Settings::Revision() in the same transaction.
+//               (2) Whoever loses a camera by a change of a group that is denied to him loses his sessions with it.
+class Groups {
+  public:
+    // The store must outlive this object.
+    explicit Groups(Store& store) : connection_(store.connection()) {}
+
+    // Stores the record under a new id, which it returns. Throws InvalidRecord, AlreadyExists, or NotFound for an
+    // unknown camera.
+    int Add(const CameraGroup& group);
+    // Replaces the record of group.id. Throws as Add, and NotFound for an unknown group.
+    void Update(const CameraGroup& group);
+    // Removes the group and what is denied of it. Throws NotFound.
+    void Remove(int id);
+
+    std::optional<CameraGroup> Find(int id);
+    std::vector<CameraGroup> List();  // by id
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store

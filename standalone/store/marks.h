@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Marks: alarms reported by a device, sales reported by a till. Their footage is a span of a camera's recordings.
+//
+// Why so        Whoever reports one may not wait for the footage, which is complete only after the post-record time. So a
+//               mark is stored at once as pending, and the recorder, which owns the mounts, writes the span file.
+#pragma once
+
+#include <cstdint>
+#include <limits>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+// The numbers are stored, and are those of a client's event types.
+enum class MarkKind : int { kAlert = 1, kPos = 2 };
+
+enum class MarkState : int {
+    kPending = 0,  // the recorder has not seen the end of its span yet
+    kSaved = 1,    // the span file is on the mount
+    kMissed = 2,   // nothing of the span was recorded
+};
+
+constexpr std::int64_t kMaxMarkSeconds = 3600;
+constexpr std::size_t kMaxMarkTextBytes = 8192;
+
+struct Mark {
+    int id = 0;
+    MarkKind kind = MarkKind::kAlert;
+    int camera_id = 0;
+    std::int64_t moment_s = 0;  // when it happened
+    std::int64_t start_s = 0;   // the footage: with the camera's time before …
+    std::int64_t end_s = 0;     // … and after
+    std::string text;           // lines divided by "\n"; what the till printed, or what the alarm said
+    MarkState state = MarkState::kPending;
+    int mount_id = 0;  // these two once it is saved
+    std::string path;  // of the span file, relative to the mount
+    bool demo = false;
+};
+
+// Which marks to read; a fresh one names those of no camera.
+struct MarkFilter {
+    std::set<int> camera_ids;
+    std::optional<MarkKind> kind;
+    std::int64_t begin_s = 0;  // marks whose footage touches the span from here …
+    std::int64_t end_s = std::numeric_limits<std::int64_t>::max();  // … up to, not including, here
+    bool newest_first = false;
+    int offset = 0;
+    int limit = std::numeric_limits<int>::max();
+};
+
+class Marks {
+  public:
+    // The store must outlive this object.
+    explicit Marks(Store& store) : connection_(store.connection()) {}
+
+    // Stores a pending mark and returns it with its id and with the span that the camera's recording plan asks for.
+    // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
+    // characters but line ends. Throws InvalidRecord, or NotFound for an unknown camera.
+    Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text);
+    // Stores rows as they are, under ids of their own.
+    void AddAll(const std::vector<Mark>& marks);
+
+    // These are false when there is no such mark.
+    bool Save(int id, int mount_id, const std::string& path);
+    bool Miss(int id);
+    bool Remove(int id);
+
+    std::optional<Mark> Find(MarkKind kind, int id);
+    // By start and id.
+    std::vector<Mark> List(const MarkFilter& filter);
+    // The recorder's work, by the end of the span. Costs nothing when there is none.
+    std::vector<Mark> Pending();
+    // Marks of the camera whose footage ended at or before that time, the oldest first; a trial's and pending ones left
+    // out. What retention removes once it has removed the footage.
+    std::vector<Mark> EndedBy(int camera_id, std::int64_t time_s, int limit);
+    // Every saved mark of the mount but a trial's, by id.
+    std::vector<Mark> OnMount(int mount_id);
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store

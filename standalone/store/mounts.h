@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Storage mounts: the folders that recordings are written to, and how much of them may be kept.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+struct Mount {
+    int id = 0;                  // from 1, never used twice, since events carry it
+    std::string name;            // UTF-8, 1 to 64 bytes, no other mount's
+    std::string path;            // absolute; no mount lies inside another
+    std::int64_t max_bytes = 0;  // retention keeps below this; 0: no limit but the disk's
+    std::int64_t max_age_s = 0;  // retention removes what is older; 0: no limit
+    bool enabled = true;         // recordings are written to it; those on it can be played either way
+    bool is_default = false;     // where cameras record that name no mount
+};
+
+// Invariants    (1) Every change raises Settings::Revision() in the same transaction.
+//               (2) While there are mounts, exactly one is the default.
+class Mounts {
+  public:
+    // The store must outlive this object.
+    explicit Mounts(Store& store) : connection_(store.connection()) {}
+
+    // Stores the record under a new id, which it returns; the first mount becomes the default. Does not look at the
+    // folder. Throws InvalidRecord or AlreadyExists.
+    int Add(const Mount& mount);
+    // Replaces the record of mount.id; is_default can be given, not taken. Throws InvalidRecord or NotFound.
+    void Update(const Mount& mount);
+    // Forgets the mount; its files stay. Throws NotFound, and InvalidRecord for the default while there are others, for
+    // a mount that a camera's plan names, and, unless forget_events, for one that holds events or saved marks; else
+    // their rows go too.
+    void Remove(int id, bool forget_events);
+
+    std::optional<Mount> Find(int id);
+    // The default for id 0.
+    std::optional<Mount> FindForPlan(int id);
+    std::vector<Mount> List();  // by id
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store

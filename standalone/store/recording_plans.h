@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Recording plans: when a camera is recorded, in what pieces, and where to.
+#pragma once
+
+#include <map>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+// The numbers are stored. A camera that is never recorded still is around its marks.
+enum class RecordMode : int { kNever = 0, kAlways = 1 };
+
+constexpr int kMinSegmentSeconds = 10;
+constexpr int kMaxSegmentSeconds = 3600;
+constexpr int kMaxAroundMarkSeconds = 300;
+
+// A camera without a plan of its own has a fresh one.
+struct RecordingPlan {
+    RecordMode mode = RecordMode::kNever;
+    int segment_s = 300;  // kMinSegmentSeconds … kMaxSegmentSeconds
+    int pre_s = 5;        // before a mark and after it, 0 … kMaxAroundMarkSeconds
+    int post_s = 10;
+    int mount_id = 0;  // 0: the default mount
+    int profile = 0;   // which of the camera's profiles; one that it lacks means the live profile
+};
+
+class RecordingPlans {
+  public:
+    // The store must outlive this object.
+    explicit RecordingPlans(Store& store) : connection_(store.connection()) {}
+
+    // Raises Settings::Revision(). Throws InvalidRecord, or NotFound for an unknown camera or mount.
+    void Set(int camera_id, const RecordingPlan& plan);
+    RecordingPlan Find(int camera_id);
+    // By camera, those without a plan of their own left out.
+    std::map<int, RecordingPlan> List();
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store
