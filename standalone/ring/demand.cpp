@@ -99,7 +99,7 @@ void Demand::Touch(LiveStream stream) {
     }
     const std::int64_t before = slot->touched_micros.exchange(now);
     if (!IsYounger(before, now, kFreshMicros)) {
-        Wake(table.wishes);
+        ring::Wake(table.wishes);
     }
 }
 
@@ -114,6 +114,10 @@ std::vector<LiveStream> Demand::ActiveStreams(std::int64_t now_micros, std::chro
     std::ranges::sort(streams);
     streams.erase(std::unique(streams.begin(), streams.end()), streams.end());
     return streams;
+}
+
+void Demand::Wake() {
+    ring::Wake(Shared().wishes);
 }
 
 void Demand::WaitForDemand(std::chrono::milliseconds timeout) {

@@ -40,8 +40,11 @@ class Demand {
     // The streams stamped at most max_age before now (base::MonotonicMicros), sorted, each once.
     std::vector<LiveStream> ActiveStreams(std::int64_t now_micros, std::chrono::microseconds max_age = kMaxAge) const;
 
-    // Waits until a stream is wanted that was not before the last call, or the time is over; a signal ends the wait
-    // too.
+    // Ends the recorder's WaitForDemand: something else wants to be looked at.
+    void Wake();
+
+    // Waits until a stream is wanted that was not before the last call, or Wake is called, or the time is over; a signal
+    // ends the wait too.
     void WaitForDemand(std::chrono::milliseconds timeout);
 
   private:
