@@ -76,8 +76,8 @@ class TortureReader {
         bool whole = IsFilled(*entry, seed);
         if (random_() % 512 == 0) {
             std::this_thread::sleep_for(std::chrono::microseconds(random_() % 2'000));
-        } else if (random_() % 8 == 0) {
-            std::this_thread::yield();
+        } else if (random_() % 128 == 0) {
+            std::this_thread::yield();  // on a busy machine several milliseconds: not often
         }
         whole = whole && IsFilled(*entry, seed) && entry->Count() == count &&
                 static_cast<std::uint64_t>(entry->sequence) == (count - 1) % 10'001;
@@ -109,6 +109,17 @@ class TortureWriter {
         const bool is_written = writer_.Write(
             {.data = data, .is_key = written_++ % 10 == 0, .timestamp_micros = static_cast<std::int64_t>(seed)});
         ++(is_written ? findings_.written : findings_.dropped);
+    }
+
+    // Goes round the ring at full speed, then lets the readers catch up for a moment: a writer that never rests leaves
+    // them no processor on a busy machine.
+    void WriteBurst() {
+        for (std::uint64_t left = 1 + random_() % 256; left > 0; --left) {
+            WriteOnce(random_() % 4 == 0 ? 3'000 : 500);
+        }
+        if (findings_.written > findings_.verified) {
+            std::this_thread::sleep_for(std::chrono::microseconds(50));
+        }
     }
 
   private:

@@ -17,18 +17,21 @@ constexpr std::uint64_t kFrames = 100'000;  // a race detector sees nothing betw
 #else
 constexpr std::uint64_t kFrames = 1'000'000;
 #endif
-constexpr std::int64_t kLongestRunMicros = 150'000'000;  // ten times what it takes on idle cores
+constexpr std::int64_t kLongestRunMicros = 200'000'000;  // many times what it takes on idle cores
+constexpr std::uint64_t kMostFramesBetweenKills = 4'000;
 constexpr std::size_t kReaders = 4;
 const StreamId kId{1, 0, Medium::kVideo};
 
-// Writes until it is killed, or now and then ends in order.
+// Writes until it is killed; now and then it ends the stream in order and begins another.
 void RunWriter(const base::Installation& installation, std::uint64_t seed, Findings& findings) {
     std::mt19937_64 random(seed);
-    Writer writer(installation, kId, {"H264", {}, 0, 0, false}, {.index_slots = 128, .arena_bytes = 1 << 18});
-    auto source = std::make_unique<TortureWriter>(writer, random(), findings);
-    const bool ends_in_order = random() % 8 == 0;
-    for (std::uint64_t left = ends_in_order ? random() % 20'000 : UINT64_MAX; left > 0; --left) {
-        source->WriteOnce(random() % 4 == 0 ? 3'000 : 500);
+    for (;;) {
+        Writer writer(installation, kId, {"H264", {}, 0, 0, false}, {.index_slots = 128, .arena_bytes = 1 << 18});
+        const auto source = std::make_unique<TortureWriter>(writer, random(), findings);
+        const bool ends_in_order = random() % 8 == 0;
+        for (std::uint64_t left = ends_in_order ? random() % 100 : UINT64_MAX; left > 0; --left) {
+            source->WriteBurst();
+        }
     }
 }
 
@@ -70,13 +73,17 @@ TEST_F(TortureTest, ProcessesKilledAtAnyInstructionTearNoFrameAndLeaveNothing) {
     const std::int64_t end = base::MonotonicMicros() + kLongestRunMicros;
     int kills = 0;
     int failed_children = 0;
+    // Kills come after so many frames, not so much time: where the machine is busy, a process still gets to work.
     while (findings.verified < kFrames && base::MonotonicMicros() < end) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(random() % 40));
+        const std::uint64_t next_kill = findings.verified + random() % kMostFramesBetweenKills;
+        while (findings.verified < next_kill && base::MonotonicMicros() < end) {
+            std::this_thread::sleep_for(std::chrono::microseconds(random() % 1'000));
+        }
         // The writer is killed as often as all readers together.
         const std::size_t victim = random() % 2 == 0 ? 0 : 1 + random() % kReaders;
         ::kill(processes[victim], SIGKILL);
         const int status = WaitFor(processes[victim]);
-        failed_children += WIFEXITED(status) && (WEXITSTATUS(status) != 0 || victim != 0) ? 1 : 0;
+        failed_children += WIFEXITED(status) ? 1 : 0;
         ++kills;
         start(victim);
     }
@@ -89,7 +96,7 @@ TEST_F(TortureTest, ProcessesKilledAtAnyInstructionTearNoFrameAndLeaveNothing) {
     EXPECT_EQ(findings.out_of_order, 0U);
     EXPECT_EQ(failed_children, 0);
     EXPECT_GE(findings.verified, kFrames);
-    EXPECT_GE(kills, 50);
+    EXPECT_GE(kills, 100);
     EXPECT_EQ(findings.dropped, 0U) << "killed readers keep room";
     RemoveOrphans(installation_);
     EXPECT_TRUE(ListSegments(installation_).empty());
