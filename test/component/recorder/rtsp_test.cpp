@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder against an RTSP camera that sends one codec or another, stalls, loses its picture, vanishes and returns.
+// The recorder against an RTSP camera that sends one codec or another, changes its picture's size, stalls, loses its
+// picture, vanishes and returns.
 #include <algorithm>
 #include <csignal>
 #include <cstdlib>
@@ -14,11 +15,11 @@ namespace lookhaven::test {
 
 namespace {
 
-void ExpectStill(const Seen& key_frame, media::Codec codec) {
+void ExpectStill(const Seen& key_frame, media::Codec codec, media::PictureSize expected = {320, 240}) {
     const std::vector<std::uint8_t> jpeg = media::JpegOfKeyFrame(
         codec, {reinterpret_cast<const std::uint8_t*>(key_frame.data.data()), key_frame.data.size()});
     const std::optional<media::PictureSize> size = media::JpegSize(jpeg);
-    EXPECT_TRUE(size && size->width == 320 && size->height == 240);
+    EXPECT_TRUE(size && size->width == expected.width && size->height == expected.height);
 }
 
 class RtspTest : public RecorderTest {
@@ -115,6 +116,41 @@ TEST_F(RtspTest, EveryCodecComesThroughAndDecodes) {
         ASSERT_NE(listener.Ring(), nullptr);
         EXPECT_STREQ(ring::Codec(listener.Ring()), row.audio);
     }
+}
+
+TEST_F(RtspTest, PictureOfAnotherSizeGoesOnInARingOfItsOwnAndTheSoundStays) {
+    MakeStore();
+    const Child rtsp_camera = StartCamera();
+    const Child recorder = StartRecorder("5");
+    const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + "/live");
+    Viewer viewer(*installation_, camera);
+    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    ExpectDecodesFromEveryKeyFrame(viewer.Take(30), 1);
+    listener.Take(5);
+    ASSERT_FALSE(HasFailure());
+    EXPECT_EQ(ring::Width(viewer.Ring()), 320);
+    const std::span extra = ring::ExtraData(viewer.Ring());
+    const std::vector<unsigned char> extra_before(extra.begin(), extra.end());
+    void* ring_before = ring::Attach(*installation_, {camera, 0, ring::Medium::kVideo});
+    rtsp_camera.Signal(SIGWINCH);
+    std::vector<Seen> pictures(1);
+    ASSERT_TRUE(Eventually([&] {
+        pictures[0] = viewer.Next();
+        return ring::Width(viewer.Ring()) == 640;
+    }));
+    EXPECT_TRUE(ring::IsRetired(ring_before)) << "its viewers are not told";
+    ring::Detach(ring_before);
+    for (Seen& picture : viewer.Take(60)) {
+        pictures.push_back(std::move(picture));
+    }
+    ASSERT_TRUE(pictures[0].key_frame);
+    ExpectStill(pictures[0], media::Codec::kH264, {640, 480});
+    ExpectDecodesFromEveryKeyFrame(pictures, 2);
+    EXPECT_FALSE(std::ranges::equal(ring::ExtraData(viewer.Ring()), extra_before));
+    EXPECT_TRUE(listener.IsCurrent()) << "the sound has not changed";
+    const std::vector<Seen> blocks = listener.Take(20);
+    EXPECT_EQ(Decoded("aac", ring::ExtraData(listener.Ring()), blocks), blocks.size());
+    EXPECT_EQ(Segments(), 2u);
 }
 
 }  // namespace

@@ -5,8 +5,8 @@
 //
 //   rtsp-camera <port>     0 takes a free one; the port is printed when the camera is ready
 //
-// SIGUSR1 withholds the picture, while the sound goes on; SIGUSR2 gives it back. To stall, stop the process (SIGSTOP);
-// to vanish, kill it. The pipeline ends with its parent.
+// SIGUSR1 withholds the picture, while the sound goes on; SIGUSR2 gives it back. SIGWINCH doubles its width and height.
+// To stall, stop the process (SIGSTOP); to vanish, kill it. The pipeline ends with its parent.
 #include <csignal>
 #include <cstdio>
 #include <string>
@@ -19,8 +19,8 @@
 namespace {
 
 constexpr const char* kPicture =
-    "videotestsrc is-live=true pattern=ball ! video/x-raw,format=I420,width=320,height=240,framerate=25/1 "
-    "! valve name=picture ! ";
+    "videotestsrc is-live=true pattern=ball "
+    "! capsfilter name=form caps=video/x-raw,format=I420,width=320,height=240,framerate=25/1 ! valve name=picture ! ";
 constexpr const char* kH264 = "x264enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
                               "! rtph264pay name=pay0 pt=96 config-interval=-1 ";
 constexpr const char* kH265 = "x265enc tune=zerolatency speed-preset=ultrafast key-int-max=25 bitrate=300 "
@@ -43,6 +43,7 @@ constexpr Mount kMounts[] = {
 
 bool g_withheld = false;
 std::vector<GstElement*> g_valves;  // of all clients
+std::vector<GstElement*> g_forms;
 
 void Withhold(bool on) {
     g_withheld = on;
@@ -51,9 +52,18 @@ void Withhold(bool on) {
     }
 }
 
+void EnlargePicture() {
+    GstCaps* caps = gst_caps_from_string("video/x-raw,format=I420,width=640,height=480,framerate=25/1");
+    for (GstElement* form : g_forms) {
+        g_object_set(form, "caps", caps, nullptr);
+    }
+    gst_caps_unref(caps);
+}
+
 void OnMedia(GstRTSPMediaFactory*, GstRTSPMedia* media, gpointer) {
     GstElement* pipeline = gst_rtsp_media_get_element(media);
     g_valves.push_back(gst_bin_get_by_name(GST_BIN(pipeline), "picture"));
+    g_forms.push_back(gst_bin_get_by_name(GST_BIN(pipeline), "form"));
     gst_object_unref(pipeline);
     Withhold(g_withheld);
 }
@@ -86,6 +96,8 @@ int main(int argc, char** argv) {
         SIGUSR1, [](gpointer) -> gboolean { return Withhold(true), TRUE; }, nullptr);
     g_unix_signal_add(
         SIGUSR2, [](gpointer) -> gboolean { return Withhold(false), TRUE; }, nullptr);
+    g_unix_signal_add(
+        SIGWINCH, [](gpointer) -> gboolean { return EnlargePicture(), TRUE; }, nullptr);
     std::printf("%d\n", gst_rtsp_server_get_bound_port(server));
     std::fflush(stdout);
     g_main_loop_run(loop);
