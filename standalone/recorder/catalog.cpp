@@ -4,13 +4,42 @@
 #include <exception>
 #include <utility>
 
+#include "standalone/base/blocked_signals.h"
 #include "standalone/base/log.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::recorder {
 
-void Catalog::Refresh() noexcept {
+Catalog::Catalog(std::string store_url, std::function<void()> on_change)
+    : store_url_(std::move(store_url)),
+      on_change_(std::move(on_change)) {
+    const base::BlockedSignals blocked;
+    thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
+}
+
+void Catalog::Refresh() {
+    const std::lock_guard lock(mutex_);
+    is_asked_ = true;
+    asked_.notify_one();
+}
+
+std::shared_ptr<const Catalog::Streams> Catalog::Current() const {
+    const std::lock_guard lock(mutex_);
+    return current_;
+}
+
+void Catalog::Run(const std::stop_token& stop) {
+    for (std::unique_lock lock(mutex_); asked_.wait(lock, stop, [this] { return is_asked_; });) {
+        is_asked_ = false;
+        lock.unlock();
+        TryToRead();
+        lock.lock();
+    }
+    has_ended_ = true;
+}
+
+void Catalog::TryToRead() noexcept {
     try {
         Read();
         if (!std::exchange(reported_failure_, {}).empty()) {
@@ -35,7 +64,7 @@ void Catalog::Read() {
         return;
     }
     store::Cameras cameras(*store_);
-    std::map<ring::LiveStream, StreamPlan> streams;
+    auto streams = std::make_shared<Streams>();
     for (const store::Camera& camera : cameras.List()) {
         if (!camera.enabled) {
             continue;
@@ -46,11 +75,15 @@ void Catalog::Read() {
             if (credentials) {
                 plan.credentials = {credentials->account, credentials->password};
             }
-            streams.emplace(ring::LiveStream{camera.id, profile.number}, std::move(plan));
+            streams->emplace(ring::LiveStream{camera.id, profile.number}, std::move(plan));
         }
     }
-    streams_ = std::move(streams);
     revision_ = revision;
+    {
+        const std::lock_guard lock(mutex_);
+        current_ = std::move(streams);
+    }
+    on_change_();
 }
 
 }  // namespace lookhaven::recorder

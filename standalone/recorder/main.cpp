@@ -44,7 +44,7 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
         supervisor.Step();
     }
     if (!supervisor.Finish(kFinishLimit)) {
-        base::LogWarning("stopped, though a camera's host name was still being looked up");
+        base::LogWarning("stopped, though the store or the look-up of a camera's host name still hangs");
         ::_exit(EX_OK);
     }
     base::LogInfo("stopped");

@@ -25,7 +25,7 @@ Supervisor::Supervisor(const base::Installation& installation, std::chrono::mill
       no_data_limit_(no_data_limit),
       demand_(installation),
       common_config_(installation),
-      catalog_(installation.StoreUrl()) {
+      catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }) {
     DoEverySecond();
     Reconcile();  // wishes may be older than this recorder
 }
@@ -39,11 +39,12 @@ void Supervisor::Step() {
 }
 
 bool Supervisor::Finish(std::chrono::milliseconds limit) {
+    catalog_.RequestStop();
     for (const auto& [stream, worker] : workers_) {
         worker->RequestStop();
     }
     const std::int64_t end_us = base::MonotonicMicros() + std::chrono::microseconds(limit).count();
-    while (DropEndedWorkers(), !workers_.empty()) {
+    while (DropEndedWorkers(), !workers_.empty() || !catalog_.HasEnded()) {
         const std::int64_t now_us = base::MonotonicMicros();
         if (now_us >= end_us) {
             return false;
@@ -76,9 +77,10 @@ void Supervisor::DoEverySecond() {
 
 void Supervisor::Reconcile() {
     const std::vector<ring::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
+    const std::shared_ptr<const Catalog::Streams> catalog = catalog_.Current();
     std::map<ring::LiveStream, StreamPlan> plans;
     for (const ring::LiveStream& stream : wanted) {
-        if (const auto plan = catalog_.Streams().find(stream); plan != catalog_.Streams().end()) {
+        if (const auto plan = catalog->find(stream); plan != catalog->end()) {
             plans.insert(*plan);
         }
     }

@@ -29,7 +29,7 @@ class Supervisor {
     // One pass: waits up to a second for something to do and does it. A signal cuts the wait.
     void Step();
 
-    // Stops all streams. False when one of them did not end within the limit; the process must then leave without
+    // Stops all threads. False when one of them did not end within the limit; the process must then leave without
     // destroying the supervisor, which would wait for it.
     bool Finish(std::chrono::milliseconds limit);
 
