@@ -1,0 +1,17 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Why a file of the archive cannot be used.
+#pragma once
+
+#include <stdexcept>
+
+namespace lookhaven::archive {
+
+// The file is damaged, foreign or empty, said in one sentence. That it cannot be opened or read at all is a
+// std::system_error instead.
+class ArchiveError : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
+}  // namespace lookhaven::archive

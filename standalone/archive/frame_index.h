@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The list of a recording's frames beside the recording, so that any frame is found without reading what is before it.
+//
+// Format        A header of 64 bytes, then 24 bytes a frame in the order of the file, which is the order of decoding; all
+//               little endian. Header and entries each carry a checksum. The header's last byte is 1 once the recording
+//               is finished.
+// Crash rule    An entry is appended after its frame is in the recording. A torn entry at the end is as good as none.
+//               Until it finishes, the writer holds a lock on the file that dies with it, so a reader knows growing from
+//               left behind.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "standalone/archive/archive_error.h"
+#include "standalone/base/file_descriptor.h"
+
+namespace lookhaven::archive {
+
+// No frame of a recording is larger.
+constexpr std::uint32_t kMaxFrameBytes = 4'194'303;
+
+struct IndexHeader {
+    std::string codec;        // "MJPEG", "H264", "H265"
+    std::string audio_codec;  // "AAC", "PCMU", "PCMA", "OPUS"; empty when silent
+    int width = 0;            // pixels
+    int height = 0;
+    std::int64_t start_wall_ms = 0;  // of the frame at 0 ms
+    int reason = 0;                  // REC_METHOD of platform/recording/event.h
+
+    bool operator==(const IndexHeader&) const = default;
+};
+
+struct FrameEntry {
+    std::uint64_t offset = 0;   // of the frame's first byte in the recording
+    std::uint32_t size = 0;     // bytes, 1 … kMaxFrameBytes
+    std::uint32_t time_ms = 0;  // when it is shown, from the recording's start
+    bool key = false;           // needs no frame before it
+
+    bool operator==(const FrameEntry&) const = default;
+};
+
+class FrameIndexWriter {
+  public:
+    // Makes the file, which must not exist, and locks it. Throws std::system_error.
+    FrameIndexWriter(const std::filesystem::path& path, const IndexHeader& header);
+
+    // Appends the entries, whose frames are in the recording already. Throws std::system_error; then the file holds what
+    // it held before.
+    void Append(std::span<const FrameEntry> entries);
+
+    // Marks the recording finished and gives the lock up. Throws std::system_error.
+    void Finish();
+
+  private:
+    base::FileDescriptor file_;
+    std::uint64_t size_bytes_ = 0;
+};
+
+// Thread safety: one thread per reader; any number of readers beside the single writer, in any process.
+class FrameIndexReader {
+  public:
+    // Throws std::system_error when the file cannot be opened, ArchiveError when it is no frame index.
+    explicit FrameIndexReader(const std::filesystem::path& path);
+
+    const IndexHeader& Header() const { return header_; }
+
+    // Appends the entries that were not read yet and whose frames lie within the recording's first recording_bytes; in
+    // the order of the file. Throws ArchiveError when the index is damaged.
+    void ReadNew(std::uint64_t recording_bytes, std::vector<FrameEntry>& entries);
+
+    // Still being written, by a writer that lives.
+    bool IsGrowing() const;
+    // The writer came to its orderly end.
+    bool IsFinished() const;
+
+  private:
+    std::string path_;
+    base::FileDescriptor file_;
+    IndexHeader header_;
+    std::uint64_t position_bytes_ = 0;
+    std::uint64_t frames_end_ = 0;  // where the last frame that was read ends in the recording
+};
+
+}  // namespace lookhaven::archive

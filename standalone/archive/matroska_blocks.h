@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Walks a Matroska file, finished or not, to learn where its video frames lie; reads heads only, never frames.
+//
+// Why so        A frame index is written from what is in the file, not from what was handed to a muxer, and is made anew
+//               the same way when it was lost.
+// Invariants    Every size read from the file is checked against the file before use; nothing it says makes the walk
+//               read outside the file, loop without progress or claim memory.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "standalone/archive/archive_error.h"
+#include "standalone/archive/frame_index.h"
+
+namespace lookhaven::archive {
+
+class MatroskaBlocks {
+  public:
+    // Reads the file's head up to its first cluster. Borrows the descriptor. Throws ArchiveError when this is no Matroska
+    // file with a video track that we know; std::system_error.
+    explicit MatroskaBlocks(int file);
+
+    // What the head says; the reason is 0, and the start is 0 when it does not say.
+    const IndexHeader& Header() const { return header_; }
+
+    // Appends the video frames of the next cluster that is whole. False, without a change, when there is none (yet): the
+    // file ends, is cut, or what follows is no cluster. May be asked again after the file has grown. Throws
+    // std::system_error.
+    bool ReadCluster(std::vector<FrameEntry>& frames);
+
+    // The end of the last whole cluster, or of the head.
+    std::uint64_t Position() const { return position_; }
+
+  private:
+    struct Element;
+
+    std::optional<Element> ReadElement(std::uint64_t at, std::uint64_t end) const;
+    std::uint64_t ReadUnsigned(const Element& element) const;
+    std::string ReadText(const Element& element) const;
+    void ReadHead();
+    void ReadInfo(const Element& info);
+    void ReadTrack(const Element& track);
+    void ReadVideoSize(const Element& video);
+    bool ReadBlocks(const Element& cluster, std::vector<FrameEntry>& frames) const;
+    std::optional<FrameEntry> ReadBlock(const Element& block, std::int64_t cluster_time, bool& is_video) const;
+
+    int file_;
+    IndexHeader header_;
+    std::uint64_t position_ = 0;
+    std::uint64_t timestamp_scale_ns_ = 1'000'000;
+    std::uint64_t video_track_ = 0;
+};
+
+}  // namespace lookhaven::archive

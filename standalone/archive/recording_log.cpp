@@ -1,0 +1,85 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/archive/recording_log.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <stdexcept>
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include "standalone/archive/layout.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::archive {
+
+namespace {
+
+constexpr std::int64_t kDaySeconds = 86'400;
+
+// Calls day(path, offset, first, count) for each day that the seconds touch: count seconds from offset within the day,
+// which are those from "first" of the stretch on.
+template <class Day>
+void ForEachDay(const std::filesystem::path& camera_folder, std::int64_t begin_s, std::int64_t end_s, Day day) {
+    for (std::int64_t at = std::max<std::int64_t>(begin_s, 0); at < end_s;) {
+        const std::int64_t offset = at % kDaySeconds;
+        const std::int64_t count = std::min(kDaySeconds - offset, end_s - at);
+        day(camera_folder / DayOf(at) / "seconds", offset, static_cast<std::size_t>(at - begin_s),
+            static_cast<std::size_t>(count));
+        at += count;
+    }
+}
+
+}  // namespace
+
+void WriteRecordingLog(const std::filesystem::path& camera_folder, std::int64_t begin_s, std::int64_t end_s,
+                       std::uint8_t reason) {
+    if (end_s - begin_s > kDaySeconds) {
+        throw std::logic_error("a stretch of recording longer than a day");
+    }
+    const auto write = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t, std::size_t count) {
+        std::filesystem::create_directory(path.parent_path());
+        const base::FileDescriptor log = base::OpenFile(path, O_WRONLY | O_CREAT);
+        std::array<std::uint8_t, 4096> bytes{};
+        bytes.fill(reason);
+        for (std::size_t done = 0; done < count;) {
+            const ssize_t written = ::pwrite(log.Get(), bytes.data(), std::min(bytes.size(), count - done),
+                                             offset + static_cast<off_t>(done));
+            if (written < 0 && errno != EINTR) {
+                base::ThrowErrno("cannot write " + path.string());
+            }
+            done += static_cast<std::size_t>(std::max<ssize_t>(written, 0));
+        }
+        // Readers take what is missing at the end for zeros, but the file says its size for those who look at it.
+        if (::lseek(log.Get(), 0, SEEK_END) < kDaySeconds && ::ftruncate(log.Get(), kDaySeconds) != 0) {
+            base::ThrowErrno("cannot write " + path.string());
+        }
+    };
+    ForEachDay(camera_folder, begin_s, end_s, write);
+}
+
+bool ReadRecordingLog(const std::filesystem::path& camera_folder, std::int64_t begin_s,
+                      std::span<std::uint8_t> seconds) {
+    std::error_code ignored;
+    if (!std::filesystem::is_directory(camera_folder, ignored)) {
+        return false;
+    }
+    std::fill(seconds.begin(), seconds.end(), std::uint8_t{0});
+    const auto read = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t first,
+                          std::size_t count) {
+        const base::FileDescriptor log(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+        for (std::size_t done = 0; log && done < count;) {
+            const ssize_t got =
+                ::pread(log.Get(), &seconds[first + done], count - done, offset + static_cast<off_t>(done));
+            if (got == 0 || (got < 0 && errno != EINTR)) {
+                return;
+            }
+            done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+        }
+    };
+    ForEachDay(camera_folder, begin_s, begin_s + static_cast<std::int64_t>(seconds.size()), read);
+    return true;
+}
+
+}  // namespace lookhaven::archive

@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Finishes recordings that their writer could not finish.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+
+#include "standalone/archive/frame_index.h"
+
+namespace lookhaven::archive {
+
+// What a recording holds after all.
+struct Contents {
+    IndexHeader header;
+    int frame_count = 0;
+    std::int64_t duration_ms = 0;  // to the end of the last frame's time on the screen
+    std::uint64_t size_bytes = 0;  // of the recording and its index
+};
+
+// Cuts the recording behind its last whole cluster and makes its index say exactly what is there; an absent or damaged
+// index is made anew. Does nothing to a recording that is whole. frame_count is 0 when nothing can be saved; then the
+// files are unchanged, and the caller may remove them. Throws ArchiveError when the recording is still being written,
+// std::system_error.
+Contents CloseCrashed(const std::filesystem::path& recording);
+
+}  // namespace lookhaven::archive
