@@ -51,14 +51,6 @@ void RequireCamera(const Camera& camera) {
     Require(camera.FindProfile(camera.live_profile) != nullptr, "the live view needs a profile that the camera has");
 }
 
-void RequireKnown(soci::session& sql, int id) {
-    int found = 0;
-    sql << "select id from cameras where id = :id", soci::use(id, "id"), soci::into(found);
-    if (!sql.got_data()) {
-        throw NotFound("there is no camera " + std::to_string(id));
-    }
-}
-
 void Insert(soci::session& sql, int id, const Camera& camera) {
     const int enabled = camera.enabled;
     const int type = static_cast<int>(camera.video_type);
@@ -133,7 +125,7 @@ void Cameras::Update(const Camera& camera) {
     RequireCamera(camera);
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireKnown(sql, camera.id);
+        RequireCameraRow(sql, camera.id);
         Insert(sql, camera.id, camera);
     });
 }
@@ -141,7 +133,7 @@ void Cameras::Update(const Camera& camera) {
 void Cameras::Remove(int id) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireKnown(sql, id);
+        RequireCameraRow(sql, id);
         sql << "delete from cameras where id = :id", soci::use(id, "id");
     });
 }
@@ -161,7 +153,7 @@ void Cameras::SetCredentials(int id, const std::optional<Credentials>& credentia
             "a camera's account and password are at most 255 bytes of UTF-8 each, without control characters");
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireKnown(sql, id);
+        RequireCameraRow(sql, id);
         sql << "delete from camera_credentials where camera_id = :id", soci::use(id, "id");
         if (credentials) {
             sql << "insert into camera_credentials (camera_id, account, password) values (:id, :account, :password)",

@@ -77,8 +77,16 @@ bool Connection::HasTable(const std::string& name) {
 
 // SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the time-out,
 // when somebody wrote in between.
-Connection::Transaction::Transaction(Connection& connection) : session_(connection.session_) {
+Connection::Transaction::Transaction(Connection& connection, Durability durability) : session_(connection.session_) {
+    const bool lazy = durability == Durability::kLazy;
+    if (lazy && connection.IsSqlite()) {
+        session_ << "pragma synchronous = normal";  // takes no effect inside a transaction
+        restore_sync_ = true;
+    }
     session_ << (connection.IsSqlite() ? "begin immediate" : "begin");
+    if (lazy && !connection.IsSqlite()) {
+        session_ << "set local synchronous_commit = off";
+    }
 }
 
 void Connection::Transaction::Commit() {
@@ -87,11 +95,13 @@ void Connection::Transaction::Commit() {
 }
 
 Connection::Transaction::~Transaction() {
-    if (!open_) {
-        return;
-    }
     try {
-        session_ << "rollback";
+        if (open_) {
+            session_ << "rollback";
+        }
+        if (restore_sync_) {
+            session_ << "pragma synchronous = full";
+        }
     } catch (const soci::soci_error&) {
         // The connection is gone, and the transaction with it.
     }
@@ -103,6 +113,21 @@ int NextId(soci::session& sql, const std::string& counter) {
            " else value + 1 end where name = :counter returning value",
         soci::use(kPeerUserId, "reserved"), soci::use(counter, "counter"), soci::into(id);
     return id;
+}
+
+int NextIds(soci::session& sql, const std::string& counter, int count) {
+    int last = 0;
+    sql << "update counters set value = value + :count where name = :counter returning value",
+        soci::use(count, "count"), soci::use(counter, "counter"), soci::into(last);
+    return last - count + 1;
+}
+
+void RequireCameraRow(soci::session& sql, int id) {
+    int found = 0;
+    sql << "select id from cameras where id = :id", soci::use(id, "id"), soci::into(found);
+    if (!sql.got_data()) {
+        throw NotFound("there is no camera " + std::to_string(id));
+    }
 }
 
 void RaiseRevision(soci::session& sql) {

@@ -16,6 +16,10 @@ namespace lookhaven::store {
 
 enum class Engine { kSqlite, kPostgresql };
 
+// Whether a power cut right after the change may lose it. Changes that come every second and that the next one repeats
+// need not wait for the disk.
+enum class Durability { kSafe, kLazy };
+
 // A store's address, taken apart.
 struct StoreAddress {
     Engine engine;
@@ -45,9 +49,9 @@ class Connection {
 
     // Calls change(session) inside a transaction that is taken back when change throws.
     template <typename Change>
-    auto Write(Change&& change) {
+    auto Write(Change&& change, Durability durability = Durability::kSafe) {
         return Read([&](soci::session& sql) {
-            Transaction transaction(*this);
+            Transaction transaction(*this, durability);
             if constexpr (std::is_void_v<decltype(change(sql))>) {
                 change(sql);
                 transaction.Commit();
@@ -62,7 +66,7 @@ class Connection {
   private:
     class Transaction {
       public:
-        explicit Transaction(Connection& connection);
+        Transaction(Connection& connection, Durability durability);
         Transaction(const Transaction&) = delete;
         Transaction& operator=(const Transaction&) = delete;
         ~Transaction();
@@ -70,6 +74,7 @@ class Connection {
 
       private:
         soci::session& session_;
+        bool restore_sync_ = false;
         bool open_ = true;
     };
 
@@ -77,8 +82,14 @@ class Connection {
     soci::session session_;
 };
 
-// The next id of "user" or "camera". Inside Write only; concurrent callers wait for each other until the commit.
+// The next id of "user", "camera", "event", "mount" or "group". Inside Write only; concurrent callers wait for each other until the commit.
 int NextId(soci::session& sql, const std::string& counter);
+
+// The first of that many ids in a row. Inside Write only.
+int NextIds(soci::session& sql, const std::string& counter, int count);
+
+// Throws NotFound. Inside Write only.
+void RequireCameraRow(soci::session& sql, int id);
 
 // Tells those who poll Settings::Revision() that cameras or settings changed. Inside Write only.
 void RaiseRevision(soci::session& sql);

@@ -35,8 +35,47 @@ constexpr const char* kAccountsAndCameras[] = {
     "create table settings (name text not null primary key, value text not null)",
 };
 
+constexpr const char* kRecordings[] = {
+    "insert into counters (name, value) values ('event', 0), ('mount', 0), ('group', 0)",
+
+    "create table mounts (id integer not null primary key, name text not null unique, path text not null unique,"
+    " max_bytes bigint not null, max_age bigint not null, enabled integer not null, is_default integer not null)",
+    "create table recording_plans (camera_id integer not null primary key references cameras (id) on delete cascade,"
+    " mode integer not null, segment integer not null, pre_record integer not null, post_record integer not null,"
+    " mount_id integer not null, profile integer not null)",
+
+    // No reference to cameras here either: recordings outlive their camera.
+    "create table events (id integer not null primary key, camera_id integer not null, mount_id integer not null,"
+    " start_s bigint not null, end_s bigint not null, recording integer not null, reason integer not null,"
+    " frame_count integer not null, size_bytes bigint not null, video_type integer not null,"
+    " audio_codec text not null, width integer not null, height integer not null, path text not null,"
+    " archived integer not null, demo integer not null)",
+    "create index events_by_start on events (camera_id, start_s)",
+    "create index events_by_mount on events (mount_id, camera_id, id)",
+    // Partial, so that an event that grows or is made up costs nothing here.
+    "create index events_by_age on events (mount_id, start_s) where recording = 0 and archived = 0 and demo = 0",
+    "create index events_open on events (id) where recording = 1",
+    "create index events_demo on events (id) where demo = 1",
+
+    "create table marks (id integer not null primary key, kind integer not null, camera_id integer not null,"
+    " moment_s bigint not null, start_s bigint not null, end_s bigint not null, text text not null,"
+    " state integer not null, mount_id integer not null, path text not null, demo integer not null)",
+    "create index marks_by_start on marks (camera_id, start_s)",
+    "create index marks_by_mount on marks (mount_id, id)",
+    "create index marks_pending on marks (end_s) where state = 0",
+    "create index marks_demo on marks (id) where demo = 1",
+
+    "create table camera_groups (id integer not null primary key, name text not null unique)",
+    "create table group_cameras (group_id integer not null references camera_groups (id) on delete cascade,"
+    " camera_id integer not null, primary key (group_id, camera_id))",
+    "create table denied_groups (user_id integer not null references users (id) on delete cascade,"
+    " group_id integer not null references camera_groups (id) on delete cascade, access integer not null,"
+    " primary key (user_id, access, group_id))",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
+    {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
 };
 
 }  // namespace

@@ -41,6 +41,52 @@ void EndSessions(soci::session& sql, int user_id) {
     sql << "delete from sessions where user_id = :user", soci::use(user_id, "user");
 }
 
+// Where a denial stands.
+struct DenialTable {
+    const char* insert;
+    const char* remove;
+};
+
+constexpr DenialTable kDeniedCameras = {
+    "insert into denied_cameras (user_id, camera_id, access) values (:user, :subject, :access) on conflict do nothing",
+    "delete from denied_cameras where user_id = :user and camera_id = :subject and access = :access"};
+constexpr DenialTable kDeniedGroups = {
+    "insert into denied_groups (user_id, group_id, access) values (:user, :subject, :access) on conflict do nothing",
+    "delete from denied_groups where user_id = :user and group_id = :subject and access = :access"};
+
+void ForEachKind(soci::session& sql, const char* statement, int user, int subject,
+                 std::initializer_list<CameraAccess> kinds) {
+    for (const CameraAccess kind : kinds) {
+        const int access = static_cast<int>(kind);
+        sql << statement, soci::use(user, "user"), soci::use(subject, "subject"), soci::use(access, "access");
+    }
+}
+
+void DenyRows(soci::session& sql, const DenialTable& table, int user, int subject,
+              std::initializer_list<CameraAccess> kinds) {
+    RequireUser(sql, user);
+    ForEachKind(sql, table.insert, user, subject, kinds);
+    EndSessions(sql, user);
+}
+
+void AllowRows(soci::session& sql, const DenialTable& table, int user, int subject,
+               std::initializer_list<CameraAccess> kinds) {
+    RequireUser(sql, user);
+    ForEachKind(sql, table.remove, user, subject, kinds);
+}
+
+std::set<int> DeniedIds(soci::session& sql, const char* query, int user, CameraAccess kind) {
+    std::set<int> ids;
+    int id = 0;
+    const int access = static_cast<int>(kind);
+    soci::statement rows = (sql.prepare << query, soci::use(user, "user"), soci::use(access, "access"), soci::into(id));
+    rows.execute();
+    while (rows.fetch()) {
+        ids.insert(id);
+    }
+    return ids;
+}
+
 std::optional<User> FetchOne(soci::session& sql, const std::string& condition, auto value) {
     User user;
     int privilege = 0;
@@ -126,27 +172,26 @@ void Users::SetPassword(int id, std::string_view password) {
 }
 
 void Users::Deny(int id, int camera_id, std::initializer_list<CameraAccess> kinds) {
-    connection_.Write([&](soci::session& sql) {
-        RequireUser(sql, id);
-        for (const CameraAccess kind : kinds) {
-            const int access = static_cast<int>(kind);
-            sql << "insert into denied_cameras (user_id, camera_id, access) values (:user, :camera, :access)"
-                   " on conflict do nothing",
-                soci::use(id, "user"), soci::use(camera_id, "camera"), soci::use(access, "access");
-        }
-        EndSessions(sql, id);
-    });
+    connection_.Write([&](soci::session& sql) { DenyRows(sql, kDeniedCameras, id, camera_id, kinds); });
 }
 
 void Users::Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds) {
+    connection_.Write([&](soci::session& sql) { AllowRows(sql, kDeniedCameras, id, camera_id, kinds); });
+}
+
+void Users::DenyGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds) {
     connection_.Write([&](soci::session& sql) {
-        RequireUser(sql, id);
-        for (const CameraAccess kind : kinds) {
-            const int access = static_cast<int>(kind);
-            sql << "delete from denied_cameras where user_id = :user and camera_id = :camera and access = :access",
-                soci::use(id, "user"), soci::use(camera_id, "camera"), soci::use(access, "access");
+        int found = 0;
+        sql << "select id from camera_groups where id = :id", soci::use(group_id, "id"), soci::into(found);
+        if (!sql.got_data()) {
+            throw NotFound("there is no camera group " + std::to_string(group_id));
         }
+        DenyRows(sql, kDeniedGroups, id, group_id, kinds);
     });
+}
+
+void Users::AllowGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds) {
+    connection_.Write([&](soci::session& sql) { AllowRows(sql, kDeniedGroups, id, group_id, kinds); });
 }
 
 void Users::Remove(int id) {
@@ -158,17 +203,19 @@ void Users::Remove(int id) {
 
 std::set<int> Users::DeniedCameras(int id, CameraAccess kind) {
     return connection_.Read([&](soci::session& sql) {
-        std::set<int> cameras;
-        int camera = 0;
-        const int access = static_cast<int>(kind);
-        soci::statement rows =
-            (sql.prepare << "select camera_id from denied_cameras where user_id = :user and access = :access",
-             soci::use(id, "user"), soci::use(access, "access"), soci::into(camera));
-        rows.execute();
-        while (rows.fetch()) {
-            cameras.insert(camera);
-        }
-        return cameras;
+        return DeniedIds(sql,
+                         "select camera_id from denied_cameras where user_id = :user and access = :access"
+                         " union select camera_id from group_cameras join denied_groups"
+                         " on denied_groups.group_id = group_cameras.group_id"
+                         " where user_id = :user and access = :access",
+                         id, kind);
+    });
+}
+
+std::set<int> Users::DeniedGroups(int id, CameraAccess kind) {
+    return connection_.Read([&](soci::session& sql) {
+        return DeniedIds(sql, "select group_id from denied_groups where user_id = :user and access = :access", id,
+                         kind);
     });
 }
 
