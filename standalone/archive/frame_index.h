@@ -44,6 +44,10 @@ struct FrameEntry {
     bool operator==(const FrameEntry&) const = default;
 };
 
+// From the first frame to where the last one leaves the screen, if the frames follow each other evenly and none stands
+// longer than a second. last_time_ms: of the last frame; 0 without frames.
+std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms);
+
 class FrameIndexWriter {
   public:
     // Makes the file, which must not exist, and locks it. Throws std::system_error.
@@ -56,7 +60,10 @@ class FrameIndexWriter {
     // Marks the recording finished and gives the lock up. Throws std::system_error.
     void Finish();
 
+    std::uint64_t SizeBytes() const { return size_bytes_; }
+
   private:
+    std::string path_;
     base::FileDescriptor file_;
     std::uint64_t size_bytes_ = 0;
 };

@@ -10,6 +10,7 @@
 
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -38,21 +39,27 @@ class MatroskaBlocks {
   private:
     struct Element;
 
-    std::optional<Element> ReadElement(std::uint64_t at, std::uint64_t end) const;
-    std::uint64_t ReadUnsigned(const Element& element) const;
-    std::string ReadText(const Element& element) const;
+    std::span<const std::uint8_t> Bytes(std::uint64_t at, std::size_t count);
+    std::optional<Element> ReadElementHead(std::uint64_t at);
+    std::optional<Element> ReadElement(std::uint64_t at, std::uint64_t end);
+    template <class Visit>
+    bool ForEachChild(const Element& parent, Visit visit);
+    std::uint64_t Unsigned(const Element& element);
+    std::string Text(const Element& element);
     void ReadHead();
     void ReadInfo(const Element& info);
     void ReadTrack(const Element& track);
-    void ReadVideoSize(const Element& video);
-    bool ReadBlocks(const Element& cluster, std::vector<FrameEntry>& frames) const;
-    std::optional<FrameEntry> ReadBlock(const Element& block, std::int64_t cluster_time, bool& is_video) const;
+    bool ReadFrames(const Element& cluster, std::vector<FrameEntry>& frames);
+    bool ReadBlock(const Element& block, std::uint64_t cluster_time, bool simple, std::vector<FrameEntry>& frames);
+    std::uint64_t FileSize() const;
 
     int file_;
     IndexHeader header_;
     std::uint64_t position_ = 0;
     std::uint64_t timestamp_scale_ns_ = 1'000'000;
     std::uint64_t video_track_ = 0;
+    std::vector<std::uint8_t> window_;  // a piece of the file, read last
+    std::uint64_t window_at_ = 0;
 };
 
 }  // namespace lookhaven::archive

@@ -12,6 +12,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <span>
 #include <vector>
 
@@ -78,7 +79,9 @@ class Recording {
     bool is_span_ = false;
     std::int64_t start_wall_ms_ = 0;
     std::int64_t end_wall_ms_ = 0;  // of a span
+    std::size_t named_ = 0;         // recordings of the span that were looked for
     std::vector<std::unique_ptr<Segment>> segments_;
+    std::size_t read_segments_ = 0;  // those that have ended and were read to the end
     std::vector<RecordedFrame> frames_;
     bool grows_ = false;
 };

@@ -1,0 +1,258 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/archive/frame_index.h"
+
+#include <algorithm>
+#include <array>
+#include <bit>
+#include <cerrno>
+#include <cstddef>
+#include <cstring>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "standalone/archive/layout.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::archive {
+
+namespace {
+
+static_assert(std::endian::native == std::endian::little, "the file is little endian");
+
+constexpr std::array<char, 8> kMagic{'L', 'H', 'F', 'R', 'A', 'M', 'E', 'S'};
+constexpr std::uint32_t kVersion = 1;
+constexpr std::uint32_t kKeyFlag = 1;
+constexpr int kMaxSidePixels = 16384;
+constexpr std::int64_t kMaxWallMs = 253'402'300'800'000;  // the year 10000
+constexpr std::uint32_t kMaxTimeMs = (kMaxRecordingSeconds + 60) * 1000;
+
+struct RawHeader {
+    std::array<char, 8> magic = kMagic;
+    std::uint32_t version = kVersion;
+    std::uint32_t check = 0;
+    std::int64_t start_wall_ms = 0;
+    std::int32_t width = 0;
+    std::int32_t height = 0;
+    std::int32_t reason = 0;
+    std::array<char, 8> codec{};
+    std::array<char, 8> audio_codec{};
+    std::array<std::uint8_t, 11> unused{};
+    std::uint8_t finished = 0;  // outside the checksum, since it changes under the eyes of readers
+};
+static_assert(sizeof(RawHeader) == 64 && offsetof(RawHeader, finished) == 63);
+
+struct RawEntry {
+    std::uint64_t offset = 0;
+    std::uint32_t size = 0;
+    std::uint32_t time_ms = 0;
+    std::uint32_t flags = 0;
+    std::uint32_t check = 0;
+};
+static_assert(sizeof(RawEntry) == 24);
+
+constexpr off_t kMaxFileBytes = sizeof(RawHeader) + off_t{sizeof(RawEntry)} * kMaxTimeMs;
+
+// FNV-1a: any one changed byte changes it, and it is not 0 for zeros.
+std::uint32_t Checksum(const void* data, std::size_t size) {
+    const auto* bytes = static_cast<const std::uint8_t*>(data);
+    std::uint32_t sum = 2'166'136'261U;
+    for (std::size_t i = 0; i < size; ++i) {
+        sum = (sum ^ bytes[i]) * 16'777'619U;
+    }
+    return sum;
+}
+
+std::uint32_t CheckOf(const RawEntry& entry) {
+    return Checksum(&entry, offsetof(RawEntry, check));
+}
+
+std::uint32_t CheckOf(RawHeader header) {
+    header.check = 0;
+    return Checksum(&header, offsetof(RawHeader, finished));
+}
+
+std::array<char, 8> Name(const std::string& text) {
+    std::array<char, 8> name{};
+    text.copy(name.data(), name.size());
+    return name;
+}
+
+std::string Text(const std::array<char, 8>& name) {
+    return {name.data(), ::strnlen(name.data(), name.size())};
+}
+
+void WriteAll(int file, const void* data, std::size_t size, std::uint64_t at, const std::string& path) {
+    const auto* bytes = static_cast<const char*>(data);
+    for (std::size_t done = 0; done < size;) {
+        const ssize_t written = ::pwrite(file, bytes + done, size - done, static_cast<off_t>(at + done));
+        if (written < 0 && errno != EINTR) {
+            base::ThrowErrno("cannot write " + path);
+        }
+        done += static_cast<std::size_t>(std::max<ssize_t>(written, 0));
+    }
+}
+
+// How much of the buffer the file could fill.
+std::size_t ReadUpTo(int file, void* buffer, std::size_t size, std::uint64_t at, const std::string& path) {
+    std::size_t done = 0;
+    while (done < size) {
+        const ssize_t got =
+            ::pread(file, static_cast<char*>(buffer) + done, size - done, static_cast<off_t>(at + done));
+        if (got == 0) {
+            break;
+        }
+        if (got < 0 && errno != EINTR) {
+            base::ThrowErrno("cannot read " + path);
+        }
+        done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+    }
+    return done;
+}
+
+struct flock WholeFile(short type) {
+    struct flock lock {};
+    lock.l_type = type;
+    lock.l_whence = SEEK_SET;
+    return lock;
+}
+
+bool IsKnown(const IndexHeader& header) {
+    const auto is_one_of = [](const std::string& name, std::initializer_list<const char*> names) {
+        return std::find(names.begin(), names.end(), name) != names.end();
+    };
+    return is_one_of(header.codec, {"MJPEG", "H264", "H265"}) &&
+           is_one_of(header.audio_codec, {"", "AAC", "PCMU", "PCMA", "OPUS"}) && header.width > 0 &&
+           header.width <= kMaxSidePixels && header.height > 0 && header.height <= kMaxSidePixels &&
+           header.start_wall_ms >= 0 && header.start_wall_ms < kMaxWallMs;
+}
+
+}  // namespace
+
+std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms) {
+    if (frame_count == 0) {
+        return 0;
+    }
+    constexpr std::int64_t kLongestMs = 1000;
+    const std::int64_t period_ms = frame_count > 1 ? last_time_ms / (frame_count - 1) : kLongestMs;
+    return last_time_ms + std::clamp<std::int64_t>(period_ms, 1, kLongestMs);
+}
+
+FrameIndexWriter::FrameIndexWriter(const std::filesystem::path& path, const IndexHeader& header)
+    : path_(path.string()),
+      file_(base::OpenFile(path, O_RDWR | O_CREAT | O_EXCL, 0640)) {
+    RawHeader raw;
+    raw.start_wall_ms = header.start_wall_ms;
+    raw.width = header.width;
+    raw.height = header.height;
+    raw.reason = header.reason;
+    raw.codec = Name(header.codec);
+    raw.audio_codec = Name(header.audio_codec);
+    raw.check = CheckOf(raw);
+    try {
+        // This kind of lock belongs to the open file, not to the process, and some systems of files know none.
+        struct flock lock = WholeFile(F_WRLCK);
+        if (::fcntl(file_.Get(), F_OFD_SETLK, &lock) != 0) {
+            base::ThrowErrno("cannot lock " + path_);
+        }
+        WriteAll(file_.Get(), &raw, sizeof(raw), 0, path_);
+    } catch (...) {
+        ::unlink(path.c_str());
+        throw;
+    }
+    size_bytes_ = sizeof(raw);
+}
+
+void FrameIndexWriter::Append(std::span<const FrameEntry> entries) {
+    std::vector<RawEntry> raw;
+    raw.reserve(entries.size());
+    for (const FrameEntry& entry : entries) {
+        raw.push_back({entry.offset, entry.size, entry.time_ms, entry.key ? kKeyFlag : 0, 0});
+        raw.back().check = CheckOf(raw.back());
+    }
+    try {
+        WriteAll(file_.Get(), raw.data(), raw.size() * sizeof(RawEntry), size_bytes_, path_);
+    } catch (...) {
+        // Should this fail too, the torn entry is passed over by readers.
+        [[maybe_unused]] const int result = ::ftruncate(file_.Get(), static_cast<off_t>(size_bytes_));
+        throw;
+    }
+    size_bytes_ += raw.size() * sizeof(RawEntry);
+}
+
+void FrameIndexWriter::Finish() {
+    const std::uint8_t finished = 1;
+    WriteAll(file_.Get(), &finished, 1, offsetof(RawHeader, finished), path_);
+    if (::fdatasync(file_.Get()) != 0) {
+        base::ThrowErrno("cannot write " + path_);
+    }
+    file_.Reset();
+}
+
+FrameIndexReader::FrameIndexReader(const std::filesystem::path& path)
+    : path_(path.string()),
+      file_(base::OpenFile(path, O_RDONLY)),
+      position_bytes_(sizeof(RawHeader)) {
+    RawHeader raw;
+    const std::size_t size = ReadUpTo(file_.Get(), &raw, sizeof(raw), 0, path_);
+    if (size < sizeof(raw)) {
+        throw ArchiveError(path_ + (size == 0 ? " is empty" : " is cut short"));
+    }
+    if (raw.magic != kMagic) {
+        throw ArchiveError(path_ + " is no frame index");
+    }
+    if (raw.version != kVersion) {
+        throw ArchiveError(path_ + " is a frame index of another version");
+    }
+    header_ = {Text(raw.codec), Text(raw.audio_codec), raw.width, raw.height, raw.start_wall_ms, raw.reason};
+    if (raw.check != CheckOf(raw) || raw.finished > 1 || !IsKnown(header_)) {
+        throw ArchiveError(path_ + " has a damaged head");
+    }
+}
+
+void FrameIndexReader::ReadNew(std::uint64_t recording_bytes, std::vector<FrameEntry>& entries) {
+    struct stat status {};
+    if (::fstat(file_.Get(), &status) != 0 || status.st_size > kMaxFileBytes) {
+        throw ArchiveError(path_ + " is larger than any frame index");
+    }
+    std::vector<RawEntry> block(2048);
+    bool torn = false;
+    for (std::uint64_t at = position_bytes_;;) {
+        const std::size_t got = ReadUpTo(file_.Get(), block.data(), block.size() * sizeof(RawEntry), at, path_);
+        for (const RawEntry& raw : std::span(block).first(got / sizeof(RawEntry))) {
+            if (raw.check != CheckOf(raw)) {
+                torn = true;
+                continue;
+            }
+            const bool usable = raw.size > 0 && raw.size <= kMaxFrameBytes && raw.offset < (std::uint64_t{1} << 62) &&
+                                raw.offset >= frames_end_ && raw.time_ms <= kMaxTimeMs &&
+                                (frames_end_ > 0 || (raw.flags & kKeyFlag) != 0);
+            if (torn || !usable) {
+                throw ArchiveError(path_ + " is damaged");
+            }
+            if (raw.offset + raw.size > recording_bytes) {
+                return;
+            }
+            entries.push_back({raw.offset, raw.size, raw.time_ms, (raw.flags & kKeyFlag) != 0});
+            frames_end_ = raw.offset + raw.size;
+            position_bytes_ += sizeof(RawEntry);
+        }
+        if (got < block.size() * sizeof(RawEntry)) {
+            return;
+        }
+        at += got;
+    }
+}
+
+bool FrameIndexReader::IsGrowing() const {
+    struct flock lock = WholeFile(F_RDLCK);
+    return !IsFinished() && ::fcntl(file_.Get(), F_OFD_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
+}
+
+bool FrameIndexReader::IsFinished() const {
+    std::uint8_t finished = 0;
+    return ReadUpTo(file_.Get(), &finished, 1, offsetof(RawHeader, finished), path_) == 1 && finished != 0;
+}
+
+}  // namespace lookhaven::archive

@@ -1,0 +1,253 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/archive/recording.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <cmath>
+#include <system_error>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "standalone/archive/layout.h"
+#include "standalone/archive/span_file.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::archive {
+
+namespace {
+
+constexpr std::int64_t kLongestFrameMs = 1000;
+// A frame is in the index that soon after it was recorded, or the disk is in trouble.
+constexpr std::int64_t kLatestMs = 3000;
+// H.264 and H.265 move no frame over more than this many others.
+constexpr std::size_t kMaxReordered = 16;
+
+}  // namespace
+
+// One file of the row, and its frames in the order of decoding.
+class Recording::Segment {
+  public:
+    Segment(std::filesystem::path path, std::optional<std::int64_t> base_ms)
+        : path_(std::move(path)),
+          file_(base::OpenFile(path_, O_RDONLY)),
+          index_(IndexPathOf(path_)),
+          base_ms_(base_ms) {}
+
+    // Reads what was appended. Returns the entries that have their place in the order of showing for good.
+    std::vector<std::uint32_t> Refresh() {
+        grows_ = index_.IsGrowing();  // asked first, so that an end that comes between means one more look, not a loss
+        struct stat status {};
+        if (::fstat(file_.Get(), &status) != 0) {
+            base::ThrowErrno("cannot read " + path_.string());
+        }
+        for (std::size_t i = ReadNew(static_cast<std::uint64_t>(status.st_size)); i < entries_.size(); ++i) {
+            reorders_ |= entries_[i].time_ms < latest_ms_;
+            latest_ms_ = std::max(latest_ms_, entries_[i].time_ms);
+            waiting_.push_back(static_cast<std::uint32_t>(i));
+        }
+        const auto time = [&](std::uint32_t entry) { return entries_[entry].time_ms; };
+        std::stable_sort(waiting_.begin(), waiting_.end(), [&](auto a, auto b) { return time(a) < time(b); });
+        const std::size_t kept = grows_ && reorders_ ? std::min(kMaxReordered, waiting_.size()) : 0;
+        std::vector<std::uint32_t> placed(waiting_.begin(), waiting_.end() - static_cast<std::ptrdiff_t>(kept));
+        waiting_.erase(waiting_.begin(), waiting_.begin() + static_cast<std::ptrdiff_t>(placed.size()));
+        return placed;
+    }
+
+    void ReadBytes(const FrameEntry& frame, std::span<std::uint8_t> buffer) const {
+        for (std::size_t done = 0; done < buffer.size();) {
+            const ssize_t got = ::pread(file_.Get(), buffer.data() + done, buffer.size() - done,
+                                        static_cast<off_t>(frame.offset + done));
+            if (got == 0) {
+                throw ArchiveError(path_.string() + " has become shorter");
+            }
+            if (got < 0 && errno != EINTR) {
+                base::ThrowErrno("cannot read " + path_.string());
+            }
+            done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+        }
+    }
+
+    const std::filesystem::path& Path() const { return path_; }
+    const IndexHeader& Header() const { return index_.Header(); }
+    std::span<const FrameEntry> Entries() const { return entries_; }
+    bool Grows() const { return grows_; }
+    std::int64_t LatestWallMs() const { return Header().start_wall_ms + latest_ms_; }
+    // Where the segment's 0 ms is in the row.
+    std::int64_t BaseMs(std::int64_t unless_known) {
+        base_ms_ = base_ms_.value_or(unless_known);
+        return *base_ms_;
+    }
+
+  private:
+    std::size_t ReadNew(std::uint64_t size) {
+        const std::size_t before = entries_.size();
+        index_.ReadNew(size, entries_);
+        return before;
+    }
+
+    std::filesystem::path path_;
+    base::FileDescriptor file_;
+    FrameIndexReader index_;
+    std::optional<std::int64_t> base_ms_;
+    std::vector<FrameEntry> entries_;
+    std::vector<std::uint32_t> waiting_;
+    std::uint32_t latest_ms_ = 0;
+    bool reorders_ = false;
+    bool grows_ = false;
+};
+
+Recording::Recording(const std::filesystem::path& path) : path_(path), is_span_(path.extension() == ".span") {
+    if (!is_span_) {
+        segments_.push_back(std::make_unique<Segment>(path, 0));
+        start_wall_ms_ = segments_.front()->Header().start_wall_ms;
+    }
+    Refresh();
+    if (is_span_ && segments_.empty() && !grows_) {
+        throw ArchiveError(path.string() + ": nothing of its footage is left");
+    }
+}
+
+Recording::Recording(Recording&&) noexcept = default;
+Recording::~Recording() = default;
+
+void Recording::Refresh() {
+    if (is_span_) {
+        OpenSegments();
+    }
+    // They end one after the other; what has ended is not looked at again.
+    for (; read_segments_ < segments_.size(); ++read_segments_) {
+        Append(static_cast<std::uint32_t>(read_segments_));
+        if (segments_[read_segments_]->Grows()) {
+            break;
+        }
+    }
+    const std::int64_t now_ms = base::WallMillis();
+    const bool is_open = read_segments_ < segments_.size();
+    if (is_span_) {
+        grows_ = is_open ? segments_[read_segments_]->LatestWallMs() < end_wall_ms_ : now_ms < end_wall_ms_ + kLatestMs;
+    } else {
+        grows_ = is_open;
+    }
+    if (grows_) {
+        const std::int64_t longest_ms = std::int64_t{kMaxRecordingSeconds} * 1000;
+        const std::int64_t until_ms = is_span_ ? std::min(now_ms, end_wall_ms_) : now_ms;
+        RepeatLast(std::min(until_ms - start_wall_ms_ - kLatestMs, longest_ms));
+    }
+}
+
+// Opens the recordings that the span names by now and that are not known yet.
+void Recording::OpenSegments() {
+    const Span span = ReadSpan(path_);
+    start_wall_ms_ = span.begin_ms;
+    end_wall_ms_ = span.end_ms;
+    for (; named_ < span.recordings.size(); ++named_) {
+        try {
+            segments_.push_back(
+                std::make_unique<Segment>(path_.parent_path().parent_path() / span.recordings[named_], std::nullopt));
+        } catch (const std::system_error& error) {
+            if (error.code() != std::errc::no_such_file_or_directory) {
+                throw;
+            }
+        }
+    }
+}
+
+void Recording::Append(std::uint32_t number) {
+    Segment& segment = *segments_[number];
+    const std::vector<std::uint32_t> entries = segment.Refresh();
+    // Recordings follow each other by the wall clock; when that was set back, the later one follows the earlier all the same.
+    const std::int64_t by_wall_ms = segment.Header().start_wall_ms - start_wall_ms_;
+    const std::int64_t base_ms =
+        segment.BaseMs(frames_.empty() ? by_wall_ms : std::max(by_wall_ms, frames_.back().time_ms + 1));
+    for (const std::uint32_t entry : entries) {
+        const std::int64_t time_ms = segment.Entries()[entry].time_ms;
+        const std::int64_t wall_ms = segment.Header().start_wall_ms + time_ms;
+        if (!is_span_ || (wall_ms >= start_wall_ms_ && wall_ms < end_wall_ms_)) {
+            Place(number, entry, base_ms + time_ms);
+        }
+    }
+}
+
+void Recording::Place(std::uint32_t segment, std::uint32_t entry, std::int64_t time_ms) {
+    if (!frames_.empty()) {
+        RepeatLast(time_ms);
+        time_ms = std::max(time_ms, frames_.back().time_ms + 1);
+    }
+    if (frames_.size() == INT_MAX) {
+        throw ArchiveError(path_.string() + " has more frames than can be counted");
+    }
+    frames_.push_back({segment, entry, time_ms});
+}
+
+void Recording::RepeatLast(std::int64_t before_ms) {
+    while (!frames_.empty() && before_ms - frames_.back().time_ms > kLongestFrameMs) {
+        RecordedFrame again = frames_.back();
+        again.time_ms += kLongestFrameMs;
+        frames_.push_back(again);
+    }
+}
+
+double Recording::FrameRate() const {
+    if (frames_.empty()) {
+        throw ArchiveError(path_.string() + " has no frame yet");
+    }
+    const std::int64_t duration_ms = frames_.back().time_ms - frames_.front().time_ms;
+    const double periods = static_cast<double>(frames_.size() - 1);
+    return duration_ms == 0 ? 1.0 : std::clamp(periods * 1000.0 / static_cast<double>(duration_ms), 1.0, 1000.0);
+}
+
+std::int64_t Recording::PeriodMs() const {
+    return std::max<std::int64_t>(std::llround(1000.0 / FrameRate()), 1);
+}
+
+bool Recording::Grows() const {
+    return grows_;
+}
+
+int Recording::IndexAt(std::int64_t time_ms) const {
+    if (time_ms < 0 || frames_.empty()) {
+        return -1;
+    }
+    const auto later =
+        std::upper_bound(frames_.begin(), frames_.end(), time_ms,
+                         [](std::int64_t time, const RecordedFrame& frame) { return time < frame.time_ms; });
+    const std::int64_t index = std::max<std::int64_t>(later - frames_.begin() - 1, 0);
+    if (later != frames_.end() || !grows_) {
+        return static_cast<int>(index);
+    }
+    const std::int64_t ahead = std::max<std::int64_t>(time_ms - frames_.back().time_ms, 0) / PeriodMs();
+    return static_cast<int>(std::min<std::int64_t>(index + std::min<std::int64_t>(ahead, INT_MAX), INT_MAX));
+}
+
+std::int64_t Recording::TimeOf(int index) const {
+    if (frames_.empty()) {
+        return 0;
+    }
+    const int last = FrameCount() - 1;
+    if (index > last) {
+        return frames_.back().time_ms + (grows_ ? (std::int64_t{index} - last) * PeriodMs() : 0);
+    }
+    return frames_[static_cast<std::size_t>(std::max(index, 0))].time_ms;
+}
+
+const IndexHeader& Recording::Header(std::uint32_t segment) const {
+    return segments_.at(segment)->Header();
+}
+
+std::span<const FrameEntry> Recording::Entries(std::uint32_t segment) const {
+    return segments_.at(segment)->Entries();
+}
+
+const std::filesystem::path& Recording::PathOf(std::uint32_t segment) const {
+    return segments_.at(segment)->Path();
+}
+
+void Recording::ReadBytes(std::uint32_t segment, const FrameEntry& frame, std::span<std::uint8_t> buffer) const {
+    segments_.at(segment)->ReadBytes(frame, buffer);
+}
+
+}  // namespace lookhaven::archive

@@ -1,0 +1,142 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/archive/repair.h"
+
+#include <algorithm>
+#include <optional>
+#include <system_error>
+#include <vector>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "standalone/archive/layout.h"
+#include "standalone/archive/matroska_blocks.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::archive {
+
+namespace {
+
+constexpr int kContinuous = 1;  // the REC_METHOD of a recording whose own is lost
+
+struct Index {
+    IndexHeader header;
+    std::vector<FrameEntry> frames;
+    bool is_finished = false;
+    bool is_damaged = false;  // behind the frames
+};
+
+std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::path& path) {
+    struct stat status {};
+    if (::fstat(file.Get(), &status) != 0) {
+        base::ThrowErrno("cannot read " + path.string());
+    }
+    return static_cast<std::uint64_t>(status.st_size);
+}
+
+// What is left of the index; nothing when there is none, or not even a head.
+std::optional<Index> ReadIndex(const std::filesystem::path& path, std::uint64_t recording_bytes) {
+    try {
+        FrameIndexReader reader(path);
+        if (reader.IsGrowing()) {
+            throw std::system_error(std::make_error_code(std::errc::device_or_resource_busy), path.string());
+        }
+        Index index{reader.Header(), {}, reader.IsFinished(), false};
+        try {
+            reader.ReadNew(recording_bytes, index.frames);
+        } catch (const ArchiveError&) {
+            index.is_damaged = true;
+        }
+        return index;
+    } catch (const ArchiveError&) {
+        return std::nullopt;
+    } catch (const std::system_error& error) {
+        if (error.code() == std::errc::no_such_file_or_directory) {
+            return std::nullopt;
+        }
+        throw;
+    }
+}
+
+std::uint64_t EndOf(const std::vector<FrameEntry>& frames) {
+    return frames.empty() ? 0 : frames.back().offset + frames.back().size;
+}
+
+void ReplaceIndex(const std::filesystem::path& path, const IndexHeader& header, std::span<const FrameEntry> frames) {
+    std::filesystem::path temporary = path;
+    temporary += ".new";
+    std::filesystem::remove(temporary);
+    try {
+        FrameIndexWriter writer(temporary, header);
+        writer.Append(frames);
+        writer.Finish();
+        std::filesystem::rename(temporary, path);
+    } catch (...) {
+        ::unlink(temporary.c_str());
+        throw;
+    }
+}
+
+Contents Summary(const IndexHeader& header, const std::vector<FrameEntry>& frames, std::uint64_t recording_bytes,
+                 const std::filesystem::path& index_path) {
+    std::uint32_t last_ms = 0;
+    for (const FrameEntry& frame : frames) {
+        last_ms = std::max(last_ms, frame.time_ms);
+    }
+    return {header, static_cast<int>(frames.size()), DurationMs(static_cast<std::int64_t>(frames.size()), last_ms),
+            recording_bytes + std::filesystem::file_size(index_path)};
+}
+
+// Every frame that can be reached from the beginning, and where they end.
+struct Walk {
+    IndexHeader header;
+    std::vector<FrameEntry> frames;
+    std::uint64_t end = 0;
+};
+
+std::optional<Walk> WalkRecording(int file) {
+    try {
+        MatroskaBlocks blocks(file);
+        Walk walk{blocks.Header(), {}, 0};
+        while (blocks.ReadCluster(walk.frames)) {
+        }
+        walk.end = blocks.Position();
+        // Players begin at a key frame.
+        const auto first = std::find_if(walk.frames.begin(), walk.frames.end(), [](const auto& f) { return f.key; });
+        walk.frames.erase(walk.frames.begin(), first);
+        return walk.frames.empty() ? std::nullopt : std::optional(std::move(walk));
+    } catch (const ArchiveError&) {
+        return std::nullopt;
+    }
+}
+
+}  // namespace
+
+Contents CloseCrashed(const std::filesystem::path& recording) {
+    const std::filesystem::path index_path = IndexPathOf(recording);
+    const base::FileDescriptor file = base::OpenFile(recording, O_RDWR);
+    const std::uint64_t size = SizeOf(file, recording);
+    const std::optional<Index> index = ReadIndex(index_path, size);
+    if (index && index->is_finished && !index->is_damaged && !index->frames.empty()) {
+        return Summary(index->header, index->frames, size, index_path);
+    }
+    std::optional<Walk> walk = WalkRecording(file.Get());
+    if (!walk) {
+        return {};
+    }
+    // A walk that ends before what the index knows met damage in the middle: what lies behind is still there.
+    if (index && !index->is_damaged && EndOf(index->frames) > EndOf(walk->frames)) {
+        walk->frames = index->frames;
+        walk->end = size;
+    }
+    if (walk->end < size && ::ftruncate(file.Get(), static_cast<off_t>(walk->end)) != 0) {
+        base::ThrowErrno("cannot cut " + recording.string());
+    }
+    IndexHeader header = index ? index->header : walk->header;
+    header.reason = index ? header.reason : kContinuous;
+    ReplaceIndex(index_path, header, walk->frames);
+    return Summary(header, walk->frames, std::min(size, walk->end), index_path);
+}
+
+}  // namespace lookhaven::archive
