@@ -56,7 +56,7 @@ Mount Require(soci::session& sql, int id) {
 
 bool IsFolderPath(const std::string& path) {
     return IsPlainText(path, kMaxPathBytes) && path.size() > 1 && path.front() == '/' && path.back() != '/' &&
-           std::filesystem::path(path).lexically_normal() == path;
+           std::filesystem::path(path).lexically_normal().native() == path;
 }
 
 bool IsInside(const std::string& inner, const std::string& outer) {
@@ -171,10 +171,10 @@ void Mounts::Remove(int id, bool forget_events) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
         RequireFree(sql, Require(sql, id));
-        if (CountRows(sql, "select count(*) from (select 1 from events where mount_id = :id limit 1) as some", id) +
-                CountRows(sql, "select count(*) from (select 1 from marks where mount_id = :id limit 1) as some", id) >
-            0) {
-            throw InvalidRecord("the mount \"" + mount.name + "\" holds recordings");
+        const int held = CountRows(sql, "select count(*) from events where mount_id = :id", id) +
+                         CountRows(sql, "select count(*) from marks where mount_id = :id", id);
+        if (held > 0) {
+            throw InvalidRecord("the mount \"" + mount.name + "\" holds " + std::to_string(held) + " recordings");
         }
         sql << "delete from mounts where id = :id", soci::use(id, "id");
     });

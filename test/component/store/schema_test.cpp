@@ -6,8 +6,11 @@
 
 #include <sys/stat.h>
 
-#include "standalone/store/cameras.h"
+#include "standalone/store/events.h"
+#include "standalone/store/recording_plans.h"
+#include "standalone/store/schema.h"
 #include "standalone/store/settings.h"
+#include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
 namespace lookhaven::store {
@@ -46,6 +49,30 @@ TEST_P(EmptyStore, OfAnotherVersionIsRefusedWithTheWayOut) {
     EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
     EXPECT_THAT([&] { Store::Migrate(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
     EXPECT_EQ(Ask("select version from schema_version"), "99");
+}
+
+TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
+    for (const char* statement : Migrations().front().statements) {
+        Force(statement);
+    }
+    for (const char* statement :
+         {"create table schema_version (version integer not null)", "insert into schema_version (version) values (1)",
+          "insert into users (id, name, password_hash, privilege) values (1, 'bob', 'x', 2)",
+          "insert into cameras (id, name, enabled, video_type, live_profile, ptz, audio)"
+          " values (4, 'Gate', 1, 3, 0, 0, 1)",
+          "insert into camera_profiles (camera_id, number, source, width, height, fps)"
+          " values (4, 0, 'test:h264', 0, 0, 0)",
+          "insert into denied_cameras (user_id, camera_id, access) values (1, 4, 2)",
+          "update counters set value = 4 where name = 'camera'"}) {
+        Force(statement);
+    }
+    EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
+    Store store = Store::Open(url_);
+    EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
+    EXPECT_EQ(Cameras(store).Add(*Cameras(store).Find(4)), 5);
+    EXPECT_THAT(Users(store).DeniedCameras(1, CameraAccess::kPlayback), ElementsAre(4));
+    EXPECT_EQ(RecordingPlans(store).Find(4).mode, RecordMode::kNever);
+    EXPECT_EQ(Events(store).NextId(), 1);
 }
 
 TEST_P(EmptyStore, IsSetUpOnceByMany) {

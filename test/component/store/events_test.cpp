@@ -1,0 +1,309 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Events and marks: what is asked of the store is what a look at every single one would give.
+#include <algorithm>
+#include <random>
+
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+#include "standalone/store/recording_plans.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr std::int64_t kDay = 4'000'000'000;  // beyond 31 bits
+constexpr std::int64_t kNever = std::numeric_limits<std::int64_t>::max();
+
+std::string Text(const Event& event) {
+    std::string text;
+    for (const std::int64_t field :
+         {std::int64_t{event.id}, std::int64_t{event.camera_id}, std::int64_t{event.mount_id}, event.start_s,
+          event.end_s, std::int64_t{event.recording}, std::int64_t{event.reason}, std::int64_t{event.frame_count},
+          event.size_bytes, static_cast<std::int64_t>(event.video_type), std::int64_t{event.width},
+          std::int64_t{event.height}, std::int64_t{event.archived}, std::int64_t{event.demo}}) {
+        text += std::to_string(field) + " ";
+    }
+    return text + event.audio_codec + " " + event.path;
+}
+
+std::string Text(const Mark& mark) {
+    return std::to_string(mark.id) + " " + std::to_string(static_cast<int>(mark.kind)) + " " +
+           std::to_string(mark.camera_id) + " " + std::to_string(mark.moment_s) + " " + std::to_string(mark.start_s) +
+           " " + std::to_string(mark.end_s) + " " + mark.text + " " + std::to_string(static_cast<int>(mark.state)) +
+           std::to_string(mark.mount_id) + mark.path + std::to_string(mark.demo);
+}
+
+template <typename Record>
+std::vector<std::string> Texts(const std::vector<Record>& records) {
+    std::vector<std::string> texts;
+    std::ranges::transform(records, std::back_inserter(texts), [](const Record& record) { return Text(record); });
+    return texts;
+}
+
+template <typename Record>
+std::vector<int> Ids(const std::vector<Record>& records) {
+    std::vector<int> ids;
+    std::ranges::transform(records, std::back_inserter(ids), &Record::id);
+    return ids;
+}
+
+// What a look at every record gives: those that pass, by start and id, then the slice.
+template <typename Record, typename Filter, typename Passes>
+std::vector<Record> Naive(std::vector<Record> records, const Filter& filter, Passes passes) {
+    std::erase_if(records, [&](const Record& record) {
+        return !filter.camera_ids.contains(record.camera_id) || record.start_s >= filter.end_s ||
+               record.end_s <= filter.begin_s || !passes(record);
+    });
+    const auto key = [](const Record& record) { return std::pair(record.start_s, record.id); };
+    std::ranges::sort(records, {}, key);
+    if (filter.newest_first) {
+        std::ranges::reverse(records);
+    }
+    const auto first = std::min(records.size(), static_cast<std::size_t>(filter.offset));
+    const auto count = std::min(records.size() - first, static_cast<std::size_t>(filter.limit));
+    return {records.begin() + static_cast<std::ptrdiff_t>(first),
+            records.begin() + static_cast<std::ptrdiff_t>(first + count)};
+}
+
+class EventTest : public StoreTest {
+  protected:
+    int Draw(int first, int last) { return std::uniform_int_distribution(first, last)(random_); }
+
+    Event RandomEvent() {
+        Event event;
+        event.camera_id = Draw(1, 5);
+        event.mount_id = Draw(1, 3);
+        event.start_s = kDay + Draw(0, 40) * 600;  // many start together
+        event.end_s = event.start_s + (Draw(0, 9) == 0 ? kMaxEventSeconds : Draw(0, 1200));
+        event.recording = Draw(0, 9) == 0;
+        event.reason = Draw(0, 1) == 0 ? kReasonContinuous : kReasonAlarm;
+        event.frame_count = Draw(0, 100'000);
+        event.size_bytes = 3'000'000'000LL * Draw(0, 3);
+        event.video_type = Draw(0, 1) == 0 ? VideoType::kMjpeg : VideoType::kH265;
+        event.audio_codec = Draw(0, 1) == 0 ? "" : "aac";
+        event.width = Draw(16, 8192);
+        event.height = Draw(16, 8192);
+        event.path = "1/'x\";--/" + std::to_string(Draw(0, 999));
+        event.archived = Draw(0, 4) == 0;
+        event.demo = Draw(0, 4) == 0;
+        return event;
+    }
+
+    template <typename Filter>
+    Filter RandomSpan() {
+        Filter filter;
+        for (int cameras = Draw(0, 4); cameras > 0; --cameras) {
+            filter.camera_ids.insert(Draw(0, 6));
+        }
+        if (Draw(0, 4) != 0) {
+            filter.begin_s = Draw(0, 9) == 0 ? -kNever - 1 : kDay + Draw(-10, 400) * 60;
+            filter.end_s = Draw(0, 9) == 0 ? kNever : filter.begin_s + Draw(-5, 100) * 60;
+        }
+        filter.newest_first = Draw(0, 2) == 0;
+        filter.offset = Draw(0, 2) == 0 ? Draw(0, 20) : 0;
+        filter.limit = Draw(0, 1) == 0 ? Draw(0, 20) : filter.limit;
+        return filter;
+    }
+
+    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
+
+    std::mt19937 random_{19528};
+    Events events_{store_};
+    Marks marks_{store_};
+};
+
+TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
+    std::vector<Event> all(400);
+    std::ranges::generate(all, [this] { return RandomEvent(); });
+    events_.AddAll(all);
+    std::ranges::for_each(all, [id = 1](Event& event) mutable { event.id = id++; });
+    int found = 0;
+    for (int i = 0; i < 300; ++i) {
+        auto filter = RandomSpan<EventFilter>();
+        filter.mount_id = Draw(0, 4);
+        filter.reason = Draw(0, 2) == 0 ? Draw(1, 3) : 0;
+        filter.finished_only = Draw(0, 1) == 0;
+        const auto passes = [&](const Event& event) {
+            return (filter.mount_id == 0 || event.mount_id == filter.mount_id) &&
+                   (filter.reason == 0 || event.reason == filter.reason) && !(filter.finished_only && event.recording);
+        };
+        const std::vector<Event> expected = Naive(all, filter, passes);
+        ASSERT_EQ(Texts(events_.List(filter)), Texts(expected)) << i;
+        filter.offset = 0;
+        filter.limit = std::numeric_limits<int>::max();
+        std::vector<Event> visited;
+        events_.Visit(filter, [&](const Event& event) { visited.push_back(event); });
+        EXPECT_TRUE(std::ranges::is_sorted(visited, {}, &Event::camera_id)) << i;
+        ASSERT_THAT(Texts(visited), testing::UnorderedElementsAreArray(Texts(Naive(all, filter, passes)))) << i;
+        found += static_cast<int>(expected.size());
+    }
+    EXPECT_GT(found, 1000) << "the filters let something through";
+
+    for (int mount = 0; mount <= 4; ++mount) {
+        std::set<int> cameras;
+        std::vector<Event> rows;
+        std::int64_t size = 0;
+        std::ranges::for_each(all, [&](const Event& event) {
+            if (mount == 0 || event.mount_id == mount) {
+                cameras.insert(event.camera_id);
+            }
+            if (event.mount_id == mount && !event.demo) {
+                rows.push_back(event);
+                size += event.size_bytes;
+            }
+        });
+        EXPECT_EQ(events_.CamerasOn(mount), cameras) << mount;
+        EXPECT_EQ(events_.Content(mount).events, std::ssize(rows)) << mount;
+        EXPECT_EQ(events_.Content(mount).size_bytes, size) << mount;
+        std::vector<Event> visited;
+        events_.VisitMount(mount, [&](const Event& event) { visited.push_back(*events_.Find(event.id)); });
+        std::ranges::stable_sort(rows, {}, &Event::camera_id);
+        EXPECT_EQ(Texts(visited), Texts(rows)) << mount;
+        std::erase_if(rows, [](const Event& event) { return event.recording || event.archived; });
+        const std::vector<Event> oldest = events_.Oldest(mount, 1000);
+        EXPECT_TRUE(std::ranges::is_sorted(oldest, {}, &Event::start_s));
+        EXPECT_THAT(Texts(oldest), testing::UnorderedElementsAreArray(Texts(rows))) << mount;
+    }
+    const auto demo = std::ranges::count_if(all, &Event::demo);
+    EXPECT_EQ(events_.RemoveDemo(), demo);
+    EventFilter everything;
+    everything.camera_ids = {1, 2, 3, 4, 5};
+    EXPECT_EQ(std::ssize(events_.List(everything)), 400 - demo);
+}
+
+TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
+    Event event = RandomEvent();
+    event.id = events_.NextId();
+    event.end_s = event.start_s;
+    event.recording = true;
+    event.demo = event.archived = false;
+    events_.Begin(event);
+    EXPECT_THROW(events_.Begin(event), AlreadyExists);
+    EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
+    EXPECT_THAT(events_.Oldest(event.mount_id, 1), IsEmpty()) << "retention leaves an open one alone";
+    EXPECT_TRUE(events_.Grow(event.id, event.start_s + 1, 25, 5'000'000'000));
+    EXPECT_EQ(events_.Find(event.id)->end_s, event.start_s + 1);
+    EXPECT_EQ(events_.Find(event.id)->size_bytes, 5'000'000'000);
+    EXPECT_THROW(events_.Grow(event.id, event.start_s - 1, 25, 1), InvalidRecord);
+    EXPECT_THROW(events_.Finish(event.id, event.start_s + kMaxEventSeconds + 1, 25, 1), InvalidRecord);
+    EXPECT_TRUE(events_.Finish(event.id, event.start_s + kMaxEventSeconds, 50, 6));
+    EXPECT_THAT(events_.Open(), IsEmpty());
+    EXPECT_THAT(Ids(events_.Oldest(event.mount_id, 1)), ElementsAre(event.id));
+    EXPECT_TRUE(events_.SetArchived(event.id, true));
+    EXPECT_THAT(events_.Oldest(event.mount_id, 1), IsEmpty());
+    const int unknown = events_.NextId();
+    EXPECT_GT(unknown, event.id);
+    EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1) ||
+                 events_.SetArchived(unknown, true));
+    EXPECT_EQ(events_.Remove(std::vector{event.id, unknown, event.id}), 1);
+    EXPECT_FALSE(events_.Find(event.id));
+    for (const auto& spoil : std::initializer_list<void (*)(Event&)>{
+             [](Event& e) { e.end_s = e.start_s - 1; }, [](Event& e) { e.end_s = e.start_s + kMaxEventSeconds + 1; },
+             [](Event& e) { e.start_s = -5; }, [](Event& e) { e.camera_id = 0; }, [](Event& e) { e.mount_id = 0; },
+             [](Event& e) { e.path = "a\nb"; }, [](Event& e) { e.size_bytes = -1; }}) {
+        Event broken = event;
+        spoil(broken);
+        EXPECT_THROW(events_.Begin(broken), InvalidRecord) << Text(broken);
+    }
+}
+
+// Were the durability of one change to stick, a power cut could undo what a user was told is done.
+TEST_P(EventTest, OnlyGrowingIsLeftToTheDiskToSaveLater) {
+    Event event = RandomEvent();
+    event.id = events_.NextId();
+    events_.Begin(event);
+    events_.Grow(event.id, event.end_s, 1, 1);
+    const bool sqlite = GetParam() == Engine::kSqlite;
+    EXPECT_EQ(store_.connection().Read([&](soci::session& sql) {
+        std::string setting;
+        sql << (sqlite ? "pragma synchronous" : "show synchronous_commit"), soci::into(setting);
+        return setting;
+    }),
+              sqlite ? "2" : "on");
+}
+
+TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
+    const int camera = AddCamera();
+    const Mark alert = marks_.Add(MarkKind::kAlert, camera, kDay / 2, 0, "line one\nzwei");
+    EXPECT_EQ(alert.start_s, kDay / 2 - RecordingPlan().pre_s);
+    EXPECT_EQ(alert.end_s, kDay / 2 + RecordingPlan().post_s);
+    RecordingPlans(store_).Set(camera, {.pre_s = 300, .post_s = 0});
+    const Mark sale = marks_.Add(MarkKind::kPos, camera, 100, kMaxMarkSeconds, "");
+    EXPECT_EQ(sale.start_s, 0) << "not before 1970";
+    EXPECT_EQ(sale.end_s, 100 + kMaxMarkSeconds);
+
+    EXPECT_THAT(Ids(marks_.Pending()), ElementsAre(sale.id, alert.id));
+    EXPECT_EQ(Text(marks_.Find(MarkKind::kAlert, alert.id).value()), Text(alert));
+    EXPECT_FALSE(marks_.Find(MarkKind::kPos, alert.id)) << "an alert is no sale";
+    EXPECT_FALSE(events_.Find(alert.id));
+    EXPECT_GT(events_.NextId(), sale.id) << "one counter for both";
+    EXPECT_THAT(marks_.EndedBy(camera, kDay, 9), IsEmpty()) << "pending";
+    EXPECT_TRUE(marks_.Save(sale.id, 7, "1/a.span"));
+    EXPECT_TRUE(marks_.Miss(alert.id));
+    EXPECT_THAT(marks_.Pending(), IsEmpty());
+    EXPECT_THAT(Ids(marks_.OnMount(7)), ElementsAre(sale.id));
+    EXPECT_EQ(marks_.OnMount(7)[0].path, "1/a.span");
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, 9)), ElementsAre(sale.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, 9)), ElementsAre(sale.id, alert.id));
+    EXPECT_TRUE(marks_.Remove(sale.id));
+    EXPECT_FALSE(marks_.Remove(sale.id) || marks_.Save(sale.id, 7, "x") || marks_.Miss(sale.id));
+
+    EXPECT_THROW(marks_.Add(MarkKind::kAlert, 99, 100, 0, ""), NotFound);
+    for (const auto& [moment, length] : {std::pair<std::int64_t, std::int64_t>{-1, 0},
+                                         {kNever, 0},
+                                         {1LL << 31, 0},
+                                         {100, -1},
+                                         {100, kMaxMarkSeconds + 1},
+                                         {100, kNever}}) {
+        EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, moment, length, ""), InvalidRecord) << moment << length;
+    }
+    for (const std::string& text : kHostileTexts) {
+        try {
+            const Mark kept = marks_.Add(MarkKind::kPos, camera, 100, 0, text);
+            EXPECT_EQ(marks_.Find(MarkKind::kPos, kept.id)->text, text);
+        } catch (const InvalidRecord&) {
+            EXPECT_TRUE(text.size() > kMaxMarkTextBytes ||
+                        std::ranges::any_of(text, [](char c) { return c != '\n' && (c < ' ' || c > '~'); }))
+                << text;
+        }
+    }
+}
+
+TEST_P(EventTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
+    std::vector<Mark> all(200);
+    std::ranges::generate(all, [this, id = 1]() mutable {
+        Mark mark;
+        mark.id = id++;
+        mark.kind = Draw(0, 1) == 0 ? MarkKind::kAlert : MarkKind::kPos;
+        mark.camera_id = Draw(1, 5);
+        mark.start_s = kDay / 2 + Draw(0, 40) * 600;
+        mark.moment_s = mark.start_s + 5;
+        mark.end_s = mark.start_s + (Draw(0, 5) == 0 ? 4200 : Draw(0, 600));
+        mark.text = "sale " + std::to_string(mark.id);
+        mark.state = MarkState::kSaved;
+        mark.mount_id = 1;
+        return mark;
+    });
+    marks_.AddAll(all);
+    int found = 0;
+    for (int i = 0; i < 100; ++i) {
+        auto filter = RandomSpan<MarkFilter>();
+        filter.begin_s = filter.begin_s > kDay / 2 ? filter.begin_s - kDay / 2 : filter.begin_s;
+        filter.end_s = filter.end_s != kNever ? filter.end_s - kDay / 2 : kNever;
+        filter.kind = Draw(0, 1) == 0 ? std::nullopt : std::optional(MarkKind::kPos);
+        const auto expected =
+            Naive(all, filter, [&](const Mark& mark) { return !filter.kind || mark.kind == *filter.kind; });
+        ASSERT_EQ(Texts(marks_.List(filter)), Texts(expected)) << i;
+        found += static_cast<int>(expected.size());
+    }
+    EXPECT_GT(found, 200);
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(EventTest);
+
+}  // namespace
+}  // namespace lookhaven::store
