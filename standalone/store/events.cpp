@@ -111,6 +111,10 @@ int Events::NextId() {
     return connection_.Write([](soci::session& sql) { return lookhaven::store::NextId(sql, "event"); });
 }
 
+int Events::NextIds(int count) {
+    return connection_.Write([&](soci::session& sql) { return lookhaven::store::NextIds(sql, "event", count); });
+}
+
 void Events::Begin(const Event& event) {
     RequireEvent(event);
     connection_.Write([&](soci::session& sql) {

@@ -76,6 +76,8 @@ class Events {
 
     // The id of an event or mark to come; one that is not used is lost.
     int NextId();
+    // The first of so many ids in a row; for the recorder, which must be able to begin events while the store is away.
+    int NextIds(int count);
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.
     void Begin(const Event& event);
