@@ -131,7 +131,7 @@ void Events::Begin(const Event& event) {
 void Events::AddAll(std::span<const Event> events) {
     std::ranges::for_each(events, RequireEvent);
     connection_.Write([&](soci::session& sql) {
-        int id = NextIds(sql, "event", static_cast<int>(events.size()));
+        int id = lookhaven::store::NextIds(sql, "event", static_cast<int>(events.size()));
         Row row;
         soci::statement insert = PrepareInsert(sql, row);
         for (const Event& event : events) {
