@@ -19,6 +19,9 @@
 
 namespace lookhaven::media {
 
+constexpr const char* kLibavLibrary = "liblookhaven-libav.so";
+constexpr const char* kLibavFunction = "LookhavenLibav";  // () -> const LibavLibrary*
+
 // Decodes a row of H.264 or H.265 frames and makes JPEG pictures of the ones that are asked for. One thread.
 class FrameDecoder {
   public:

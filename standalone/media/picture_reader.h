@@ -11,6 +11,7 @@
 #include <cstdint>
 #include <memory>
 #include <span>
+#include <string>
 #include <vector>
 
 #include "standalone/archive/recording.h"
@@ -28,24 +29,17 @@ class PictureReader {
     std::size_t Read(int index, std::span<std::uint8_t> buffer);
 
   private:
-    struct Place {
-        std::uint32_t segment = 0;
-        std::uint32_t entry = 0;
-
-        bool operator==(const Place&) const = default;
-    };
-
-    bool Seek(Place target);
-    void Decode(Place target);
-    std::span<const std::uint8_t> Bytes(Place place);
+    void Seek(std::uint32_t segment, std::uint32_t entry);
+    void Decode(std::uint32_t entry);
 
     const archive::Recording& recording_;
     std::unique_ptr<FrameDecoder> decoder_;
+    std::string codec_;  // the decoder's
     std::vector<std::uint8_t> bytes_;
-    bool decodes_ = false;  // the decoder is inside a row of frames
-    std::uint32_t decoder_segment_ = 0;
-    std::uint32_t next_entry_ = 0;  // to feed
-    std::int64_t shown_ = -1;       // entry of the picture that was taken last; -1 for none
+    bool is_inside_ = false;  // the decoder is inside a row of frames of the segment
+    std::uint32_t segment_ = 0;
+    std::uint32_t next_ = 0;   // the entry to feed next
+    std::int64_t shown_ = -1;  // the entry whose picture was taken last; -1 for none
 };
 
 }  // namespace lookhaven::media

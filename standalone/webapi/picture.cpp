@@ -11,13 +11,11 @@
 #include <string_view>
 #include <vector>
 
-#include <dlfcn.h>
-
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/base/log.h"
-#include "standalone/media/still_library.h"
+#include "standalone/media/libav_library.h"
 #include "standalone/ring/reader.h"
 
 namespace lookhaven::webapi {
@@ -49,27 +47,16 @@ std::optional<KeyFrame> NewestKeyFrame(int camera, int stream) {
     return frame;
 }
 
-// Loaded for the rest of the process's life: it serves one request.
-media::StillFunction LoadStillFunction() {
-    void* library = ::dlopen(media::kStillLibrary, RTLD_NOW | RTLD_LOCAL);
-    auto* still = library == nullptr ? nullptr : ::dlsym(library, media::kStillFunction);
-    if (still == nullptr) {
-        throw std::runtime_error(std::string("cannot load the decoder: ") + ::dlerror());
-    }
-    return reinterpret_cast<media::StillFunction>(still);
-}
-
 std::vector<std::uint8_t> Jpeg(KeyFrame frame) {
     if (frame.codec == "MJPEG") {
         return std::move(frame.data);
     }
-    std::vector<std::uint8_t> jpeg;
-    std::string problem;
-    if (!LoadStillFunction()(frame.codec.c_str(), frame.data.data(), frame.data.size(), jpeg, problem)) {
-        base::LogError("no picture of a key frame: " + problem);
+    try {
+        return media::LoadLibavLibrary().Still(frame.codec, frame.data);
+    } catch (const std::runtime_error& problem) {
+        base::LogError(std::string("no picture of a key frame: ") + problem.what());
         throw Failure(504, "the camera's picture cannot be decoded");
     }
-    return jpeg;
 }
 
 std::string ImageAnswer(const std::vector<std::uint8_t>& jpeg, std::int64_t capture_millis) {

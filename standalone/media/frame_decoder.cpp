@@ -1,0 +1,118 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/frame_decoder.h"
+
+#include <algorithm>
+#include <string>
+#include <utility>
+
+#include "standalone/media/jpeg.h"
+#include "standalone/media/jpeg_encoder.h"
+#include "standalone/media/source.h"
+
+namespace lookhaven::media {
+
+namespace {
+
+constexpr std::size_t kLengthBytes = 4;
+
+std::size_t LengthAt(std::span<const std::uint8_t> frame, std::size_t at) {
+    return std::size_t{frame[at]} << 24 | std::size_t{frame[at + 1]} << 16 | std::size_t{frame[at + 2]} << 8 |
+           frame[at + 3];
+}
+
+// The frame is a row of units behind their lengths, as containers have it, and nothing else.
+bool HasLengths(std::span<const std::uint8_t> frame) {
+    std::size_t at = 0;
+    while (frame.size() - at >= kLengthBytes) {
+        const std::size_t length = LengthAt(frame, at);
+        if (length > frame.size() - at - kLengthBytes) {
+            return false;
+        }
+        at += kLengthBytes + length;
+    }
+    return at == frame.size();
+}
+
+// A start code is as long as a length.
+void ReplaceLengths(std::span<std::uint8_t> frame) {
+    for (std::size_t at = 0; at < frame.size();) {
+        const std::size_t length = LengthAt(frame, at);
+        frame[at] = frame[at + 1] = frame[at + 2] = 0;
+        frame[at + 3] = 1;
+        at += kLengthBytes + length;
+    }
+}
+
+class AvFrameDecoder : public FrameDecoder {
+  public:
+    explicit AvFrameDecoder(Codec codec)
+        : context_(OpenVideoDecoder(codec)),
+          packet_(OwnAv(av_packet_alloc())),
+          frame_(OwnAv(av_frame_alloc())),
+          next_(OwnAv(av_frame_alloc())) {}
+
+    void Restart() override { avcodec_flush_buffers(context_.get()); }
+
+    void Feed(std::span<const std::uint8_t> frame, std::int64_t number) override {
+        if (frame.empty()) {
+            avcodec_send_packet(context_.get(), nullptr);
+            return;
+        }
+        av_packet_unref(packet_.get());
+        CheckAv(av_new_packet(packet_.get(), static_cast<int>(frame.size())), "cannot hold the frame");
+        std::copy(frame.begin(), frame.end(), packet_->data);
+        if (HasLengths(frame)) {
+            ReplaceLengths({packet_->data, frame.size()});
+        }
+        packet_->pts = number;
+        avcodec_send_packet(context_.get(), packet_.get());
+    }
+
+    std::optional<std::int64_t> Take() override {
+        if (avcodec_receive_frame(context_.get(), next_.get()) < 0) {
+            return std::nullopt;  // and the picture that was taken last stays
+        }
+        std::swap(frame_, next_);
+        return frame_->pts;
+    }
+
+    std::size_t Encode(std::span<std::uint8_t> jpeg) override {
+        const std::span<const std::uint8_t> picture = encoder_.Encode(*frame_);
+        if (picture.size() > jpeg.size()) {
+            throw SourceError("a picture of " + std::to_string(picture.size()) + " bytes is too large");
+        }
+        std::copy(picture.begin(), picture.end(), jpeg.begin());
+        return picture.size();
+    }
+
+  private:
+    AvPtr<AVCodecContext> context_;
+    AvPtr<AVPacket> packet_;
+    AvPtr<AVFrame> frame_;
+    AvPtr<AVFrame> next_;
+    JpegEncoder encoder_;
+};
+
+}  // namespace
+
+AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec) {
+    PrepareAv();
+    const AVCodecID id = codec == Codec::kH264   ? AV_CODEC_ID_H264
+                         : codec == Codec::kH265 ? AV_CODEC_ID_HEVC
+                                                 : AV_CODEC_ID_MJPEG;
+    const AVCodec* decoder = avcodec_find_decoder(id);
+    if (decoder == nullptr) {
+        throw SourceError(std::string("needs libavcodec with ") + avcodec_get_name(id));
+    }
+    AvPtr<AVCodecContext> context = OwnAv(avcodec_alloc_context3(decoder));
+    context->thread_count = 1;
+    context->max_pixels = std::int64_t{kMaxSidePixels} * kMaxSidePixels;
+    CheckAv(avcodec_open2(context.get(), decoder, nullptr), "cannot open the decoder");
+    return context;
+}
+
+std::unique_ptr<FrameDecoder> OpenFrameDecoder(Codec codec) {
+    return std::make_unique<AvFrameDecoder>(codec);
+}
+
+}  // namespace lookhaven::media

@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Makes JPEG pictures of decoded frames.
+//
+// Why so        JPEG has colours of its own: other coefficients and a range that most cameras do not use. Both are changed
+//               in one pass over the planes, which is cheaper than the way by RGB and loses nothing.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <vector>
+
+#include "standalone/media/libav.h"
+
+struct SwsContext;
+
+namespace lookhaven::media {
+
+class JpegEncoder {
+  public:
+    JpegEncoder();
+    ~JpegEncoder();
+
+    // The picture of the frame, valid until the next call. Throws SourceError.
+    std::span<const std::uint8_t> Encode(const AVFrame& frame);
+
+  private:
+    struct Planes {
+        const std::uint8_t* data[3] = {};
+        int strides[3] = {};
+    };
+    struct FreeScaler {
+        void operator()(SwsContext* scaler) const;
+    };
+
+    Planes OwnPlanes(int width, int height);
+    Planes ConvertColours(const AVFrame& frame);
+    Planes ConvertLayout(const AVFrame& frame);
+
+    std::unique_ptr<void, int (*)(void*)> compressor_;
+    std::unique_ptr<SwsContext, FreeScaler> scaler_;
+    std::vector<std::uint8_t> planes_;
+    std::vector<std::int32_t> mix_;  // what a row's colours add to its brightness
+    std::unique_ptr<std::uint8_t[]> jpeg_;
+    std::size_t jpeg_bytes_ = 0;
+};
+
+}  // namespace lookhaven::media

@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A Matroska file or stream being written to a descriptor.
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "standalone/media/libav.h"
+#include "standalone/media/packet.h"
+
+namespace lookhaven::media {
+
+// Order of calls: AddStream…, Begin, Write and Flush…, End. Times are in milliseconds. Each call throws
+// std::system_error with the descriptor's errno when it cannot be written to, SourceError when the muxer refuses what it
+// is given.
+class MatroskaOutput {
+  public:
+    // Borrows the descriptor. Without seeking, sizes stay open and there is no seek table.
+    MatroskaOutput(int descriptor, bool seekable);
+    MatroskaOutput(const MatroskaOutput&) = delete;
+    MatroskaOutput& operator=(const MatroskaOutput&) = delete;
+
+    // A stream's number and its parameters, to be filled in before Begin.
+    int AddStream(const StreamFormat& format);
+    int AddStream(const AVCodecParameters& parameters);
+    void SetStart(std::int64_t wall_ms);
+
+    void Begin();
+    // Times of one stream may go back by up to two seconds, as those of reordered frames do.
+    void Write(int stream, std::span<const std::uint8_t> data, std::int64_t time_ms, bool key_frame);
+    // Ends the cluster and hands everything on.
+    void Flush();
+    void End();
+
+  private:
+    struct FreeContext {
+        void operator()(AVFormatContext* context) const { avformat_free_context(context); }
+    };
+    struct FreeIo {
+        void operator()(AVIOContext* io) const;
+    };
+
+    static int WriteBytes(void* self, std::uint8_t* data, int size);
+    static std::int64_t Seek(void* self, std::int64_t offset, int whence);
+    AVStream& NewStream();
+    void Check(int result, const char* what) const;
+
+    int descriptor_;
+    int errno_ = 0;  // of the first write that failed
+    std::unique_ptr<AVIOContext, FreeIo> io_;
+    std::unique_ptr<AVFormatContext, FreeContext> context_;
+    AvPtr<AVPacket> packet_;
+    std::vector<std::int64_t> decode_ms_;  // of each stream's last frame
+};
+
+}  // namespace lookhaven::media

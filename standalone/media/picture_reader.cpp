@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/media/picture_reader.h"
+
+#include <string>
+
+#include "standalone/media/source.h"
+
+namespace lookhaven::media {
+
+std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
+    const archive::RecordedFrame& frame = recording_.At(index);
+    const std::string& codec = recording_.Header(frame.segment).codec;
+    if (codec == "MJPEG") {
+        const archive::FrameEntry& entry = recording_.Entries(frame.segment)[frame.entry];
+        if (entry.size > buffer.size()) {
+            throw SourceError("a picture of " + std::to_string(entry.size) + " bytes is too large");
+        }
+        recording_.ReadBytes(frame.segment, entry, buffer.first(entry.size));
+        return entry.size;
+    }
+    if (decoder_ == nullptr || codec != codec_) {
+        decoder_ = LoadLibavLibrary().OpenDecoder(codec);
+        codec_ = codec;
+        is_inside_ = false;
+    }
+    if (!is_inside_ || segment_ != frame.segment || shown_ != frame.entry) {
+        Seek(frame.segment, frame.entry);
+        Decode(frame.entry);
+    }
+    return decoder_->Encode(buffer);
+}
+
+// Leaves the decoder where the entry is still ahead, as near as can be.
+void PictureReader::Seek(std::uint32_t segment, std::uint32_t entry) {
+    const std::span<const archive::FrameEntry> entries = recording_.Entries(segment);
+    // Pictures may follow a key frame in the file and yet be shown, and depend on frames, before it.
+    std::uint32_t key = entry;
+    while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[entry].time_ms)) {
+        --key;
+    }
+    const bool is_ahead = is_inside_ && segment_ == segment && key <= next_ &&
+                          (shown_ < 0 || entries[entry].time_ms > entries[static_cast<std::size_t>(shown_)].time_ms);
+    if (!is_ahead) {
+        decoder_->Restart();
+        is_inside_ = true;
+        segment_ = segment;
+        next_ = key;
+        shown_ = -1;
+    }
+}
+
+// Feeds frames until the entry's picture comes, or the one that is shown next when it cannot be decoded.
+void PictureReader::Decode(std::uint32_t entry) {
+    const std::span<const archive::FrameEntry> entries = recording_.Entries(segment_);
+    for (;;) {
+        while (const std::optional<std::int64_t> number = decoder_->Take()) {
+            shown_ = *number;
+            if (entries[static_cast<std::size_t>(shown_)].time_ms >= entries[entry].time_ms) {
+                return;
+            }
+        }
+        if (!is_inside_) {
+            throw SourceError("frame " + std::to_string(entry) + " of " + recording_.PathOf(segment_).string() +
+                              " cannot be decoded");
+        }
+        if (next_ < entries.size()) {
+            bytes_.resize(entries[next_].size);
+            recording_.ReadBytes(segment_, entries[next_], bytes_);
+            decoder_->Feed(bytes_, next_++);
+        } else {
+            decoder_->Feed({}, 0);
+            is_inside_ = false;  // what it holds comes out; then it needs a new beginning
+        }
+    }
+}
+
+}  // namespace lookhaven::media
