@@ -85,10 +85,14 @@ SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size
             ThrowErrno("cannot reserve " + path.string());
         }
     }
+    *this = SharedMapping(file, size_bytes);
+}
+
+SharedMapping::SharedMapping(const FileDescriptor& file, std::size_t size_bytes) : size_bytes_(size_bytes) {
     data_ = ::mmap(nullptr, size_bytes, PROT_READ | PROT_WRITE, MAP_SHARED, file.Get(), 0);
     if (data_ == MAP_FAILED) {
         data_ = nullptr;
-        ThrowErrno("cannot map " + path.string());
+        ThrowErrno("cannot map a file");
     }
 }
 

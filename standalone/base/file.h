@@ -29,6 +29,8 @@ void WriteFileAtomically(const std::filesystem::path& path, std::string_view con
 class SharedMapping {
   public:
     SharedMapping(const std::filesystem::path& path, std::size_t size_bytes, unsigned int mode = 0600);
+    // Of an open file that is long enough.
+    SharedMapping(const FileDescriptor& file, std::size_t size_bytes);
     SharedMapping(SharedMapping&& other) noexcept;
     SharedMapping& operator=(SharedMapping&& other) noexcept;
     ~SharedMapping();

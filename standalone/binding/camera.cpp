@@ -5,18 +5,25 @@
 
 #include <algorithm>
 #include <charconv>
-#include <cstring>
+#include <filesystem>
 #include <set>
 #include <string_view>
 
 #include "platform/camera/devcap.h"
+#include "standalone/binding/camera_record.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/recording_plans.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 
 namespace store = lookhaven::store;
+using lookhaven::binding::IdSet;
 using lookhaven::binding::OrFailure;
+using lookhaven::binding::RecordOf;
 using lookhaven::binding::RequestContext;
 
 static_assert(static_cast<int>(store::VideoType::kMjpeg) == CAM_VIDEO_MJPEG);
@@ -30,9 +37,13 @@ constexpr int kNoStream = -1;
 constexpr int kDefaultLoginPort = 8080;
 constexpr unsigned int kPtzMoves = 1;  // of the PTZ abilities: the camera turns
 
-void Fill(Camera& to, const store::Camera& from) {
+}  // namespace
+
+namespace lookhaven::binding {
+
+Camera RecordOf(const store::Camera& from) {
+    Camera to;
     to.m_Id = from.id;
-    std::memset(to.m_szName, 0, sizeof to.m_szName);
     from.name.copy(to.m_szName, sizeof to.m_szName - 1);
     to.m_blEnabled = from.enabled;
     to.m_VideoType = static_cast<int>(from.video_type);
@@ -42,6 +53,7 @@ void Fill(Camera& to, const store::Camera& from) {
     }
     to.m_blPtz = from.ptz;
     to.m_blAudio = from.audio;
+    return to;
 }
 
 std::set<int> IdSet(std::string_view list) {
@@ -56,6 +68,10 @@ std::set<int> IdSet(std::string_view list) {
     }
     return ids;
 }
+
+}  // namespace lookhaven::binding
+
+namespace {
 
 struct Device : DPObjectBase {
     bool has_sound = false;
@@ -88,7 +104,7 @@ int Camera::Load(int camId, int serverId, int archiveId) {
         if (!record) {
             return -1;
         }
-        Fill(*this, *record);
+        *this = RecordOf(*record);
         return 0;
     });
 }
@@ -104,17 +120,30 @@ int Camera::GetUiStreamNo(CAM_PROFILE_TYPE profile) const {
     return m_StreamNo[index];
 }
 
+std::string Camera::GetStoragePath() const {
+    return OrFailure("Camera::GetStoragePath", std::string(), [&]() -> std::string {
+        store::Store& records = RequestContext::Current().Records();
+        const auto mount = lookhaven::binding::MayUse(m_Id, store::CameraAccess::kPlayback)
+                               ? store::Mounts(records).FindForPlan(store::RecordingPlans(records).Find(m_Id).mount_id)
+                               : std::nullopt;
+        return mount ? std::filesystem::path(mount->path) / std::to_string(m_Id) : std::filesystem::path();
+    });
+}
+
 // A store that fails is the caller's failure too: an empty list would tell of a host without cameras.
 std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds, const std::string& deniedIds, bool,
                                   bool) {
     std::list<Camera> cameras;
-    if (!groupIds.empty()) {
-        return cameras;  // there are no groups yet
+    store::Store& records = RequestContext::Current().Records();
+    std::set<int> members;
+    for (const int id : IdSet(groupIds)) {
+        members.merge(store::Groups(records).Find(id).value_or(store::CameraGroup()).camera_ids);
     }
     const std::set<int> denied = IdSet(deniedIds);
-    for (const store::Camera& record : store::Cameras(RequestContext::Current().Records()).List()) {
-        if (!denied.contains(record.id) && (record.enabled || !onlyEnabled)) {
-            Fill(cameras.emplace_back(), record);
+    for (const store::Camera& record : store::Cameras(records).List()) {
+        if (!denied.contains(record.id) && (record.enabled || !onlyEnabled) &&
+            (groupIds.empty() || members.contains(record.id))) {
+            cameras.push_back(RecordOf(record));
         }
     }
     return cameras;

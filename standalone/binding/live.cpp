@@ -12,17 +12,17 @@
 
 #include "platform/admission/host.h"
 #include "platform/live/livestream.h"
-#include "platform/privilege/privprofile.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
 #include "standalone/ring/demand.h"
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
-#include "standalone/store/users.h"
 
 namespace ring = lookhaven::ring;
 namespace store = lookhaven::store;
 using lookhaven::base::MonotonicMicros;
+using lookhaven::binding::MayUse;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
 
@@ -58,20 +58,6 @@ void EndReaderOfRetired(const void* stream) {
     if (ring::IsRetired(stream)) {
         std::raise(SIGTERM);
     }
-}
-
-bool MayWatch(store::Store& records, unsigned int caller, int camera) {
-    if (caller == PAIR_AUTH_UID) {
-        return true;
-    }
-    store::Users users(records);
-    const int id = static_cast<int>(caller);
-    return caller != 0 && users.Find(id) && !users.DeniedCameras(id, store::CameraAccess::kLive).contains(camera);
-}
-
-bool MayHear(store::Store& records, unsigned int caller, int camera) {
-    return caller == PAIR_AUTH_UID ||
-           !store::Users(records).DeniedCameras(static_cast<int>(caller), store::CameraAccess::kAudio).contains(camera);
 }
 
 void CopyExtraData(const void* stream, unsigned char* data, int& length) {
@@ -120,10 +106,10 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
     context.NotePicture();
     void* stream = OrFailure<void*>("LiveStreamFifoAt", nullptr, [&]() -> void* {
         if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo) ||
-            !MayWatch(context.Records(), context.Caller(), camId)) {
+            !MayUse(camId, store::CameraAccess::kLive)) {
             return nullptr;
         }
-        context.GrantStream({camId, streamNo}, MayHear(context.Records(), context.Caller(), camId));
+        context.GrantStream({camId, streamNo}, MayUse(camId, store::CameraAccess::kAudio));
         context.CloseRecords();
         return AttachRunning(context, {camId, streamNo, ring::Medium::kVideo});
     });

@@ -26,11 +26,11 @@ RequestContext& RequestContext::Current() {
     return context;
 }
 
-void RequestContext::Begin(const base::Installation& installation, Output* output, std::function<void()> on_stream) {
+void RequestContext::Begin(const base::Installation& installation, Output* output, RequestEvents events) {
     base::SetLogProgram("request");
     installation_ = installation;
     output_ = output;
-    on_stream_ = std::move(on_stream);
+    events_ = std::move(events);
     g_DbgLogPid = 0;
     // The module only reads it, through a declaration that knows no const.
     const void* config = base::MapDebugLog(installation);
@@ -62,9 +62,7 @@ void RequestContext::CloseRecords() {
 void RequestContext::NoteStream() {
     if (!is_stream_) {
         is_stream_ = true;
-        if (on_stream_) {
-            on_stream_();
-        }
+        events_.on_stream();
     }
 }
 

@@ -7,9 +7,12 @@
 // Thread safety One thread.
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
+#include <string>
 
 #include "platform/export.h"
 #include "standalone/base/installation.h"
@@ -20,6 +23,14 @@
 
 namespace lookhaven::binding {
 
+// What the host wants to hear of while the module works.
+struct RequestEvents {
+    // Once, when it turns out that the answer is a stream: such a request may take its time.
+    std::function<void()> on_stream = [] {};
+    // The process plays recordings, reachable under the client's stream key; its player file is written.
+    std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
+};
+
 class LH_PLATFORM_API RequestContext {
   public:
     // The context of this process. Belongs to no installation until Begin.
@@ -29,9 +40,8 @@ class LH_PLATFORM_API RequestContext {
     RequestContext(const RequestContext&) = delete;
     RequestContext& operator=(const RequestContext&) = delete;
 
-    // Borrows output for the rest of the process's life, null where nothing is sent. on_stream is called once, when it
-    // turns out that the answer is a stream: such a request may take its time.
-    void Begin(const base::Installation& installation, Output* output, std::function<void()> on_stream);
+    // Borrows output for the rest of the process's life, null where nothing is sent.
+    void Begin(const base::Installation& installation, Output* output, RequestEvents events = {});
 
     // Throws std::logic_error before Begin.
     const base::Installation& Home() const;
@@ -45,6 +55,12 @@ class LH_PLATFORM_API RequestContext {
     // The caller: a user's id, PAIR_AUTH_UID for a peer, 0 for nobody.
     unsigned int Caller() const { return caller_; }
     void SetCaller(unsigned int user_id) { caller_ = user_id; }
+    // The handle of the caller's session; empty when there is none.
+    const std::string& Session() const { return session_; }
+    void SetSession(const std::string& handle) { session_ = handle; }
+    // Cameras that the request itself gives up, whatever the caller may see.
+    const std::set<int>& RenouncedCameras() const { return renounced_cameras_; }
+    void Renounce(std::set<int> cameras) { renounced_cameras_ = std::move(cameras); }
 
     // The live stream that the caller was found to be allowed, and whether its sound is too.
     const std::optional<ring::LiveStream>& GrantedStream() const { return granted_; }
@@ -56,6 +72,7 @@ class LH_PLATFORM_API RequestContext {
 
     // The answer is a stream: it may last.
     void NoteStream();
+    void NotePlayer(std::int64_t key) { events_.on_player(key); }
     // The answer is a picture, alone or in a stream.
     void NotePicture() { wants_picture_ = true; }
     bool WantsPicture() const { return wants_picture_ || is_stream_; }
@@ -67,9 +84,11 @@ class LH_PLATFORM_API RequestContext {
   private:
     std::optional<base::Installation> installation_;
     Output* output_ = nullptr;
-    std::function<void()> on_stream_;
+    RequestEvents events_;
     std::unique_ptr<store::Store> records_;
     unsigned int caller_ = 0;
+    std::string session_;
+    std::set<int> renounced_cameras_;
     std::optional<ring::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;

@@ -9,13 +9,14 @@ namespace lookhaven::webapi {
 namespace {
 
 const char* Reason(int status) {
-    constexpr std::array<std::pair<int, const char*>, 12> kReasons{{{200, "OK"},
+    constexpr std::array<std::pair<int, const char*>, 13> kReasons{{{200, "OK"},
                                                                     {400, "Bad Request"},
                                                                     {401, "Unauthorized"},
                                                                     {403, "Forbidden"},
                                                                     {404, "Not Found"},
                                                                     {405, "Method Not Allowed"},
                                                                     {408, "Request Timeout"},
+                                                                    {409, "Conflict"},
                                                                     {429, "Too Many Requests"},
                                                                     {500, "Internal Server Error"},
                                                                     {502, "Bad Gateway"},
@@ -39,6 +40,13 @@ std::string JsonAnswer(int status, const Json::Value& body, const std::string& e
     return "Status: " + std::to_string(status) + ' ' + Reason(status) +
            "\r\nContent-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
            std::to_string(text.size()) + "\r\n" + extra + "\r\n" + text;
+}
+
+std::string SuccessAnswer(const Json::Value& data, const std::string& extra) {
+    Json::Value body;
+    body["success"] = true;
+    body["data"] = data;
+    return JsonAnswer(200, body, extra);
 }
 
 std::string FailureAnswer(const Failure& failure) {

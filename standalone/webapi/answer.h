@@ -23,6 +23,9 @@ class Failure : public std::runtime_error {
 // The whole answer. extra: further head lines, each ending in CR LF.
 std::string JsonAnswer(int status, const Json::Value& body, const std::string& extra = "");
 
+// {"success": true, "data": data}
+std::string SuccessAnswer(const Json::Value& data, const std::string& extra = "");
+
 // {"success": false, "error": {"code": status, "data": null, "message": …}}
 std::string FailureAnswer(const Failure& failure);
 

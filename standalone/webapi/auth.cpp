@@ -22,25 +22,12 @@ std::string CookieLine(const ScgiRequest& request, const std::string& value) {
            (request.Header("HTTPS") == "on" ? "; Secure\r\n" : "\r\n");
 }
 
-std::string Success(const Json::Value& data, const std::string& extra = "") {
-    Json::Value body;
-    body["success"] = true;
-    body["data"] = data;
-    return JsonAnswer(200, body, extra);
-}
-
 Json::Value Identity(const std::string& account, int user_id, bool is_manager) {
     Json::Value data;
     data["account"] = account;
     data["user_id"] = user_id;
     data["is_manager"] = is_manager;
     return data;
-}
-
-void RequirePost(const ScgiRequest& request) {
-    if (request.Header("REQUEST_METHOD") != "POST") {
-        throw Failure(405, "this method takes POST only");
-    }
 }
 
 std::string LogIn(store::Store& records, const ScgiRequest& request, const Parameters& parameters) {
@@ -57,7 +44,7 @@ std::string LogIn(store::Store& records, const ScgiRequest& request, const Param
     }
     throttle.Clear(account, address);
     const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
-    return Success(Identity(user->name, user->id, user->IsManager()), CookieLine(request, session.secret));
+    return SuccessAnswer(Identity(user->name, user->id, user->IsManager()), CookieLine(request, session.secret));
 }
 
 }  // namespace
@@ -94,11 +81,11 @@ std::string ServeAuth(binding::RequestContext& context, SlotTable& slots, const 
         throw Failure(401, "no session");
     }
     if (method == "Status") {
-        return Success(Identity(login->account, static_cast<int>(login->user_id), login->is_manager));
+        return SuccessAnswer(Identity(login->account, static_cast<int>(login->user_id), login->is_manager));
     }
     store::Sessions(context.Records()).End(login->session_handle);
     slots.EndSession(login->session_handle);
-    return Success(Json::nullValue, CookieLine(request, "; Max-Age=0"));
+    return SuccessAnswer(Json::nullValue, CookieLine(request, "; Max-Age=0"));
 }
 
 }  // namespace lookhaven::webapi

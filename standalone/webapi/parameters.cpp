@@ -117,6 +117,12 @@ Parameters ReadParameters(const ScgiRequest& request) {
     return parameters;
 }
 
+void RequirePost(const ScgiRequest& request) {
+    if (request.Header("REQUEST_METHOD") != "POST") {
+        throw Failure(405, "this method takes POST only");
+    }
+}
+
 Json::Value Find(const Parameters& parameters, const std::string& name) {
     const auto found = parameters.find(name);
     return found == parameters.end() ? Json::Value() : found->second;

@@ -20,6 +20,9 @@ using Parameters = std::map<std::string, Json::Value>;
 // one JSON object or has an account, password or cookie that is no text, or a body of another type.
 Parameters ReadParameters(const ScgiRequest& request);
 
+// For what changes something: throws Failure 405 unless the request is a POST.
+void RequirePost(const ScgiRequest& request);
+
 // The parameter's value; null when it is missing.
 Json::Value Find(const Parameters& parameters, const std::string& name);
 

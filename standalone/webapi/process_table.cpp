@@ -2,42 +2,43 @@
 #include "standalone/webapi/process_table.h"
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
-#include <charconv>
 #include <csignal>
+#include <cstdlib>
 #include <cstring>
+#include <fstream>
 #include <string>
 
-#include <fcntl.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/log.h"
+#include "standalone/base/progress_file.h"
+#include "standalone/webapi/player_file.h"
 
 namespace lookhaven::webapi {
 
 namespace {
 
+constexpr std::chrono::milliseconds kPendingSignal{5};
+
 void Signal(const base::FileDescriptor& pidfd, int number) {
     ::syscall(SYS_pidfd_send_signal, pidfd.Get(), number, nullptr, 0);
 }
 
-// A player writes its process id into a file named after its session and removes it itself, unless it was killed.
-void SweepPlayerFile(std::string_view session, pid_t pid) {
-    if (session.empty() || session.find_first_not_of("0123456789abcdef") != session.npos) {
-        return;
+// Two signals of one kind become one while the first has not been taken yet.
+bool IsPending(pid_t pid, int number) {
+    std::ifstream status("/proc/" + std::to_string(pid) + "/status");
+    for (std::string line; std::getline(status, line);) {
+        if (line.starts_with("SigPnd:") || line.starts_with("ShdPnd:")) {
+            const auto set = std::strtoull(line.c_str() + line.find(':') + 1, nullptr, 16);
+            if ((set >> (number - 1) & 1) != 0) {
+                return true;
+            }
+        }
     }
-    const std::string path = "/tmp/player_src.pid." + std::string(session);
-    const base::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
-    std::array<char, 16> text{};
-    const ssize_t length = file ? ::read(file.Get(), text.data(), text.size()) : 0;
-    pid_t owner = 0;
-    std::from_chars(text.data(), text.data() + std::max<ssize_t>(length, 0), owner);
-    if (owner == pid) {
-        ::unlink(path.c_str());
-    }
+    return false;
 }
 
 }  // namespace
@@ -100,13 +101,65 @@ void ProcessTable::Reap(pid_t pid) {
         base::LogError("request process " + std::to_string(pid) + " died of signal " +
                        std::to_string(WTERMSIG(status)));
     }
-    SweepPlayerFile(SessionOf(*found->second.slot), pid);
+    Sweep(pid, *found->second.slot);
     SlotTable::Free(*found->second.slot);
     processes_.erase(found);
 }
 
+void ProcessTable::Sweep(pid_t pid, const Slot& slot) const {
+    SweepPlayerFile(SessionOf(slot), pid);
+    if (slot.player.since_us != 0) {
+        try {
+            base::ProgressFile::Sweep(progress_folder_, slot.player.key, pid);
+        } catch (const std::exception& error) {
+            base::LogError(std::string("cannot sweep a progress file: ") + error.what());
+        }
+    }
+}
+
+bool ProcessTable::SignalSurplus() {
+    bool again = false;
+    for (const std::string& session : slots_.SessionsWithPlayers()) {
+        for (const Slot* slot : slots_.SurplusPlayers(session, ReadPlayerFile(session))) {
+            if (const auto found = processes_.find(slot->pid); found != processes_.end()) {
+                Signal(found->second.pidfd, SIGUSR1);
+                again = true;
+            }
+        }
+    }
+    return again;
+}
+
+bool ProcessTable::SignalPauses() {
+    bool again = false;
+    for (auto& [pid, process] : processes_) {
+        Player& player = process.slot->player;
+        if (player.since_us == 0 || player.pause_wanted == player.paused) {
+            continue;
+        }
+        if (IsPending(pid, SIGUSR2)) {
+            again = true;
+            continue;
+        }
+        Signal(process.pidfd, SIGUSR2);
+        player.paused = !player.paused;
+    }
+    return again;
+}
+
+void ProcessTable::SignalPlayers(Clock::time_point now) {
+    if (now < players_due_) {
+        return;
+    }
+    players_due_ = SignalSurplus() ? now + limits_.repeat : Clock::time_point::max();
+    if (SignalPauses()) {
+        players_due_ = now + kPendingSignal;
+    }
+}
+
 Clock::time_point ProcessTable::SendDueSignals(Clock::time_point now) {
-    Clock::time_point next = Clock::time_point::max();
+    SignalPlayers(now);
+    Clock::time_point next = players_due_;
     for (auto& [pid, process] : processes_) {
         const Clock::time_point answer_due = process.began + limits_.answer;
         if (!process.leaves_since && !process.slot->is_stream) {

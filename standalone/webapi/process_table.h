@@ -6,10 +6,12 @@
 //               is to leave gets SIGTERM again and again, and SIGKILL when it does not go.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
+//               (3) A player is asked to look at its player file only while that names another one of its session.
 // Thread safety One thread.
 #pragma once
 
 #include <chrono>
+#include <filesystem>
 #include <functional>
 #include <map>
 #include <optional>
@@ -31,7 +33,11 @@ struct ProcessLimits {
 
 class ProcessTable {
   public:
-    explicit ProcessTable(ProcessLimits limits) : limits_(limits) {}
+    // Borrows the slots; progress_folder: where players keep their progress files.
+    ProcessTable(ProcessLimits limits, const SlotTable& slots, std::filesystem::path progress_folder)
+        : limits_(limits),
+          slots_(slots),
+          progress_folder_(std::move(progress_folder)) {}
 
     struct Started {
         pid_t pid;
@@ -44,8 +50,10 @@ class ProcessTable {
     // The process's client is gone: tells the process to leave.
     void HangUp(pid_t pid);
     void LeaveAll();
-    // Those whose session has ended.
+    // Those whose session or player has ended.
     void LeaveEnded();
+    // Players are to be looked at: one is new, or something is wanted of one.
+    void LookAtPlayers() { players_due_ = Clock::now(); }
     // Takes in that the process has ended.
     void Reap(pid_t pid);
 
@@ -65,8 +73,15 @@ class ProcessTable {
     };
 
     static void BeginLeaving(Process& process);
+    void Sweep(pid_t pid, const Slot& slot) const;
+    void SignalPlayers(Clock::time_point now);
+    bool SignalSurplus();
+    bool SignalPauses();
 
     ProcessLimits limits_;
+    const SlotTable& slots_;
+    std::filesystem::path progress_folder_;
+    Clock::time_point players_due_ = Clock::time_point::max();
     std::map<pid_t, Process> processes_;
 };
 

@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/webapi/request_process.h"
 
+#include <algorithm>
 #include <csignal>
 #include <cstdio>
+#include <iterator>
 
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -12,10 +14,14 @@
 #include "standalone/base/log.h"
 #include "standalone/binding/request.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
 #include "standalone/webapi/answer.h"
 #include "standalone/webapi/auth.h"
+#include "standalone/webapi/catalog.h"
+#include "standalone/webapi/event.h"
 #include "standalone/webapi/parameters.h"
 #include "standalone/webapi/picture.h"
+#include "standalone/webapi/playback.h"
 
 namespace lookhaven::webapi {
 
@@ -77,6 +83,57 @@ std::string RunEntry(EntryFunction entry, VEXO::APIRequest::Context& asked) {
     throw Failure(502, "the handler gave no answer");
 }
 
+// An API that the host itself serves to sessions.
+struct OwnApi {
+    const char* api;
+    std::string (*serve)(const RequestTask& task, const ScgiRequest& request, int version,
+                         const VEXO::APIRequest::Context& asked);
+};
+
+const OwnApi kOwnApis[] = {
+    {kPictureApi,
+     [](const RequestTask&, const ScgiRequest&, int version, const VEXO::APIRequest::Context& asked) {
+         return ServePicture(RequestContext::Current(), version, asked.method, asked.parameters);
+     }},
+    {kPlaybackApi,
+     [](const RequestTask& task, const ScgiRequest& request, int version, const VEXO::APIRequest::Context& asked) {
+         return ServePlayback(RequestContext::Current(), task.slots, request, version, asked.method, asked.parameters);
+     }},
+    {kEventApi,
+     [](const RequestTask&, const ScgiRequest& request, int version, const VEXO::APIRequest::Context& asked) {
+         return ServeEvent(RequestContext::Current(), request, version, asked.method, asked.parameters);
+     }},
+    {kCatalogApi,
+     [](const RequestTask&, const ScgiRequest&, int version, const VEXO::APIRequest::Context& asked) {
+         return ServeCatalog(RequestContext::Current(), version, asked.method);
+     }},
+};
+
+// Takes in who calls; a caller without a session may only go on where the API admits by itself.
+void Admit(const RequestTask& task, const ScgiRequest& request, const std::string& api,
+           VEXO::APIRequest::Context& asked) {
+    RequestContext& context = RequestContext::Current();
+    asked.cookies = ReadCookies(request);
+    asked.remote_ip = request.Header("REMOTE_ADDR");
+    asked.login = FindLogin(context, asked.cookies);
+    context.Renounce(binding::CamerasDeniedBy(Find(asked.parameters, "privData")));
+    if (!asked.login) {
+        if (api != kSelfAdmittingApi) {
+            throw Failure(401, "no session");
+        }
+        return;
+    }
+    context.SetCaller(asked.login->user_id);
+    context.SetSession(asked.login->session_handle);
+    SlotTable::SetSession(task.slot, asked.login->session_handle);
+    if (task.slots.OlderOfSession(task.slot) >= task.max_requests_per_session) {
+        throw Failure(503, "too many requests of this session are running");
+    }
+    if (IsPlayer(api, asked.method)) {
+        PreparePlayer(task.slot.player, context.Records(), asked.method, asked.parameters);
+    }
+}
+
 std::string Serve(const RequestTask& task, const ScgiRequest& request) {
     RequestContext& context = RequestContext::Current();
     if (request.Header("REQUEST_METHOD") != "GET" && request.Header("REQUEST_METHOD") != "POST") {
@@ -94,22 +151,13 @@ std::string Serve(const RequestTask& task, const ScgiRequest& request) {
         return ServeAuth(context, task.slots, request, version, asked.method, asked.parameters);
     }
     const EntryFunction entry = task.modules.Find(api, version, asked.method);
-    if (entry == nullptr && api != kPictureApi) {
+    const auto* own =
+        std::find_if(std::begin(kOwnApis), std::end(kOwnApis), [&api](const OwnApi& each) { return api == each.api; });
+    if (entry == nullptr && own == std::end(kOwnApis)) {
         throw Failure(404, "no such api, version or method");
     }
-    asked.cookies = ReadCookies(request);
-    asked.remote_ip = request.Header("REMOTE_ADDR");
-    asked.login = FindLogin(context, asked.cookies);
-    if (asked.login) {
-        context.SetCaller(asked.login->user_id);
-        SlotTable::SetSession(task.slot, asked.login->session_handle);
-        if (task.slots.OlderOfSession(task.slot) >= task.max_requests_per_session) {
-            throw Failure(503, "too many requests of this session are running");
-        }
-    } else if (api != kSelfAdmittingApi) {
-        throw Failure(401, "no session");
-    }
-    return entry == nullptr ? ServePicture(context, version, asked.method, asked.parameters) : RunEntry(entry, asked);
+    Admit(task, request, api, asked);
+    return entry == nullptr ? own->serve(task, request, version, asked) : RunEntry(entry, asked);
 }
 
 std::string ServeOrFail(const RequestTask& task, const ScgiRequest& request) {
@@ -154,10 +202,14 @@ void LeaveHost(pid_t host, SlotTable& slots, int standard_output) {
 void RunRequest(const RequestTask& task, const ScgiRequest& request) {
     binding::Output output(STDOUT_FILENO);
     LimitAddressSpace(true);
-    RequestContext::Current().Begin(task.installation, &output, [&task] {
+    task.slot.pid = ::getpid();
+    binding::RequestEvents events;
+    events.on_stream = [&task] {
         task.slot.is_stream = true;
         LimitAddressSpace(false);
-    });
+    };
+    events.on_player = [&task](std::int64_t key) { task.slots.BeginPlayer(task.slot, key); };
+    RequestContext::Current().Begin(task.installation, &output, std::move(events));
     const std::string answer = ServeOrFail(task, request);
     std::fflush(stdout);
     // What was written before an exception cannot be taken back, and nothing may stand behind it.

@@ -54,13 +54,15 @@ Server::Server(const base::Installation& installation, const Modules& modules, b
       modules_(modules),
       limits_(limits),
       slots_(limits.requests),
-      processes_(limits.processes),
+      processes_(limits.processes, slots_, installation.ProgressFolder()),
       listener_(std::move(listener)),
       poll_(::epoll_create1(EPOLL_CLOEXEC)),
       signals_(BlockSignals()) {
     if (!poll_ || !signals_) {
         base::ThrowErrno("cannot set up the host");
     }
+    // What the players of a host that was killed have left.
+    std::filesystem::remove_all(installation.ProgressFolder());
     Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
     Watch(signals_.Get(), Kind::kSignals, 0, EPOLLIN);
     Watch(slots_.WakeDescriptor(), Kind::kWake, 0, EPOLLIN);
@@ -97,6 +99,7 @@ void Server::Handle(Kind kind, std::uint32_t id) {
         return BeginShutdown();
     case Kind::kWake:
         slots_.TakeWake();
+        processes_.LookAtPlayers();
         return processes_.LeaveEnded();
     case Kind::kWatcher:
         base::LogWarning("the session watcher has ended");

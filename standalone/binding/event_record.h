@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Turns the store's events into the platform's records.
+#pragma once
+
+#include <string>
+
+#include "platform/recording/event.h"
+#include "standalone/store/events.h"
+
+namespace lookhaven::binding {
+
+Event RecordOf(const store::Event& event, const std::string& mount_path);
+
+}  // namespace lookhaven::binding

@@ -1,0 +1,130 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/recording/eventsearch.h"
+
+#include <algorithm>
+#include <charconv>
+#include <limits>
+#include <map>
+#include <string_view>
+
+#include "standalone/archive/recording_log.h"
+#include "standalone/binding/event_record.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
+
+namespace store = lookhaven::store;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+namespace {
+
+constexpr int kFinishedOnly = 2;
+constexpr std::size_t kMaxListedIds = 4096;
+
+enum MapValue : int { kNothing = 0, kRecorded = 1, kEvent = 2 };
+
+store::EventFilter FilterOf(const EventFilterParam& asked) {
+    store::EventFilter filter;
+    filter.camera_ids = asked.m_CamIds;
+    const std::set<int> denied = lookhaven::binding::DeniedCameras(store::CameraAccess::kPlayback);
+    std::erase_if(filter.camera_ids, [&denied](int id) { return denied.contains(id); });
+    filter.mount_id = asked.m_MountId;
+    filter.begin_s = asked.m_BeginTm;
+    filter.end_s = asked.m_EndTm;
+    filter.reason = asked.m_Reason;
+    filter.finished_only = asked.m_RecordingState == kFinishedOnly;
+    filter.offset = std::max(asked.m_Offset, 0);
+    return filter;
+}
+
+int ValueOf(const unsigned char* recorded, const unsigned char* covered, int begin, int end) {
+    const auto any = [begin, end](const unsigned char* bytes) {
+        return std::any_of(bytes + begin, bytes + end, [](unsigned char byte) { return byte != 0; });
+    };
+    return any(covered) ? kEvent : any(recorded) ? kRecorded : kNothing;
+}
+
+std::string_view Trim(std::string_view text) {
+    const std::size_t begin = std::min(text.find_first_not_of(" \t"), text.size());
+    return text.substr(begin, text.find_last_not_of(" \t") + 1 - begin);
+}
+
+}  // namespace
+
+EventFilterParam::EventFilterParam()
+    : m_MountId(0),
+      m_Offset(0),
+      m_BeginTm(0),
+      m_EndTm(std::numeric_limits<std::int64_t>::max()),
+      m_Reason(0),
+      m_RecordingState(0),
+      m_CamVdoType(0) {}
+
+int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
+    return OrFailure("EventListGetAll", -1, [&] {
+        store::Store& records = RequestContext::Current().Records();
+        std::map<int, std::string> mount_paths;
+        for (const store::Mount& mount : store::Mounts(records).List()) {
+            mount_paths[mount.id] = mount.path;
+        }
+        for (const store::Event& event : store::Events(records).List(FilterOf(filter))) {
+            events.push_back(lookhaven::binding::RecordOf(event, mount_paths[event.mount_id]));
+        }
+        return 0;
+    });
+}
+
+int ReadRecLog(const std::string& storagePath, long from, int duration, unsigned char* buffer) {
+    return OrFailure("ReadRecLog", -1, [&] {
+        const bool read =
+            !storagePath.empty() && duration > 0 &&
+            lookhaven::archive::ReadRecordingLog(storagePath, from, {buffer, static_cast<std::size_t>(duration)});
+        return read ? 0 : -1;
+    });
+}
+
+void FillRecLogMap(const unsigned char* recLog, const unsigned char* eventCoverage, int duration, int interval,
+                   Json::Value& out) {
+    const int step = std::max(interval, 1);
+    out["interval"] = step;
+    Json::Value& runs = out["runs"] = Json::arrayValue;
+    int value = -1;
+    int count = 0;
+    const auto end_run = [&] {
+        if (count > 0) {
+            Json::Value& run = runs.append(Json::arrayValue);
+            run.append(value);
+            run.append(count);
+        }
+        count = 0;
+    };
+    for (int begin = 0; begin < duration;) {
+        const int end = begin + std::min(step, duration - begin);
+        const int next = ValueOf(recLog, eventCoverage, begin, end);
+        if (next != value) {
+            end_run();
+            value = next;
+        }
+        ++count;
+        begin = end;
+    }
+    end_run();
+}
+
+std::list<int> String2IntList(const std::string& text, const std::string& delimiter) {
+    std::list<int> numbers;
+    std::string_view rest = text;
+    while (!rest.empty() && numbers.size() < kMaxListedIds) {
+        const std::size_t end = std::min(delimiter.empty() ? rest.npos : rest.find(delimiter), rest.size());
+        const std::string_view word = Trim(rest.substr(0, end));
+        int number = 0;
+        const auto [after, error] = std::from_chars(word.data(), word.data() + word.size(), number);
+        if (error == std::errc() && after == word.data() + word.size()) {
+            numbers.push_back(number);
+        }
+        rest.remove_prefix(std::min(end + delimiter.size(), rest.size()));
+    }
+    return numbers;
+}

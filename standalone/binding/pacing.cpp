@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/recording/pacing.h"
+
+#include <algorithm>
+#include <optional>
+
+#include <time.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/progress_file.h"
+#include "standalone/binding/request_context.h"
+
+using lookhaven::base::MonotonicMicros;
+using lookhaven::base::ProgressFile;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+namespace {
+
+constexpr std::int64_t kMinDelayUs = 1'000;
+constexpr std::int64_t kMaxDelayUs = 10'000'000;
+
+std::int64_t Bounded(int delay_us) {
+    return std::clamp<std::int64_t>(delay_us, kMinDelayUs, kMaxDelayUs);
+}
+
+}  // namespace
+
+DelayTimer::DelayTimer(int delayUs) : m_DelayUs(Bounded(delayUs)), m_DueUs(0) {}
+
+void DelayTimer::SetDelayTime(int delayUs) {
+    m_DueUs += Bounded(delayUs) - m_DelayUs;
+    m_DelayUs = Bounded(delayUs);
+}
+
+void DelayTimer::BeginTiming() {
+    m_DueUs = MonotonicMicros() + m_DelayUs;
+}
+
+void DelayTimer::Delay() {
+    if (MonotonicMicros() - m_DueUs > m_DelayUs) {
+        return BeginTiming();  // making up for the lost time would be a burst
+    }
+    const timespec due{m_DueUs / 1'000'000, m_DueUs % 1'000'000 * 1'000};
+    ::clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &due, nullptr);
+    m_DueUs += m_DelayUs;
+}
+
+struct ProgressIndicator::Channel {
+    std::optional<ProgressFile> file;
+};
+
+ProgressIndicator::ProgressIndicator(long long key, bool create, bool owner) : m_pChannel(std::make_unique<Channel>()) {
+    OrFailure("ProgressIndicator", 0, [&] {
+        RequestContext& context = RequestContext::Current();
+        if (owner) {
+            context.NotePlayer(key);  // first: the host sweeps the files of the players that it knows
+        }
+        if (!context.Session().empty()) {
+            const std::filesystem::path folder = context.Home().ProgressFolder();
+            m_pChannel->file = create || owner ? ProgressFile::Own(folder, key, context.Session())
+                                               : ProgressFile::Open(folder, key, context.Session());
+        }
+        return 0;
+    });
+}
+
+ProgressIndicator::~ProgressIndicator() = default;
+
+int ProgressIndicator::Set(int value) {
+    return m_pChannel->file && m_pChannel->file->Set(value) ? 0 : -1;
+}
+
+int ProgressIndicator::Get() {
+    return m_pChannel->file ? m_pChannel->file->Get() : ProgressFile::kUnset;
+}

@@ -1,0 +1,29 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the caller of this request process may do with a camera.
+//
+// Why so        The module's handlers filter what they show, not all of them everything. So the platform asks here before it
+//               opens anything of a camera.
+#pragma once
+
+#include <set>
+
+#include <json/json.h>
+
+#include "platform/export.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::binding {
+
+// The cameras that the rights, as a relaying host sends them along, deny: for every kind of access. Throws Json::Exception
+// for another shape than the one in privilege.cpp.
+LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
+
+// False for a camera that is denied to the caller or that the request renounces, and for nobody as the caller. Throws
+// store::StoreError.
+LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
+
+// The cameras at which MayUse is false for a caller who is somebody. Throws store::StoreError.
+LH_PLATFORM_API std::set<int> DeniedCameras(store::CameraAccess kind);
+
+}  // namespace lookhaven::binding

@@ -1,0 +1,161 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/webapi/event.h"
+
+#include <algorithm>
+#include <optional>
+
+#include "platform/camera/camgroup.h"
+#include "platform/recording/eventsearch.h"
+#include "standalone/base/clock.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/marks.h"
+#include "standalone/webapi/answer.h"
+#include "standalone/webapi/download.h"
+
+namespace lookhaven::webapi {
+
+namespace {
+
+constexpr std::int64_t kMaxAheadSeconds = 3600;  // a till's clock may be off
+constexpr int kMaxListed = 10'000;
+
+std::int64_t NumberOr(const Parameters& parameters, const char* name, std::int64_t otherwise) {
+    const Json::Value value = Find(parameters, name);
+    return value.isNull() ? otherwise : value.asInt64();
+}
+
+std::optional<store::MarkKind> KindOf(const Parameters& parameters) {
+    const Json::Value kind = Find(parameters, "kind");
+    if (kind.isNull()) {
+        return std::nullopt;
+    }
+    if (kind == "alert" || kind == "pos") {
+        return kind == "alert" ? store::MarkKind::kAlert : store::MarkKind::kPos;
+    }
+    throw Failure(400, "kind must be alert or pos");
+}
+
+// One text, or a list of lines.
+std::string TextOf(const Json::Value& text) {
+    if (!text.isArray()) {
+        return text.asString();
+    }
+    std::string joined;
+    for (const Json::Value& line : text) {
+        joined += (joined.empty() ? "" : "\n") + line.asString();
+    }
+    return joined;
+}
+
+Json::Value LinesOf(const std::string& text) {
+    Json::Value lines(Json::arrayValue);
+    for (std::size_t at = 0; at < text.size();) {
+        const std::size_t end = std::min(text.find('\n', at), text.size());
+        lines.append(text.substr(at, end - at));
+        at = end + 1;
+    }
+    return lines;
+}
+
+const char* NameOf(store::MarkState state) {
+    return state == store::MarkState::kSaved ? "saved" : state == store::MarkState::kMissed ? "missed" : "pending";
+}
+
+Json::Value Describe(const store::Mark& mark) {
+    Json::Value json;
+    json["id"] = mark.id;
+    json["kind"] = mark.kind == store::MarkKind::kAlert ? "alert" : "pos";
+    json["camera_id"] = mark.camera_id;
+    json["time"] = Json::Int64{mark.moment_s};
+    json["start"] = Json::Int64{mark.start_s};
+    json["stop"] = Json::Int64{mark.end_s};
+    json["state"] = NameOf(mark.state);
+    json["text"] = LinesOf(mark.text);
+    return json;
+}
+
+std::string MarkIt(binding::RequestContext& context, const Parameters& parameters) {
+    const auto kind = KindOf(parameters);
+    if (!kind) {
+        throw Failure(400, "kind must be alert or pos");
+    }
+    const int camera = static_cast<int>(Find(parameters, "camera").asInt());
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t start_s = NumberOr(parameters, "start", now_s);
+    const std::int64_t length_s = NumberOr(parameters, "length", 0);
+    if (camera < 1 || start_s < 1 || start_s > now_s + kMaxAheadSeconds || length_s < 0 ||
+        length_s > store::kMaxMarkSeconds) {
+        throw Failure(400, "camera, start or length is out of its bounds");
+    }
+    if (!binding::MayUse(camera, store::CameraAccess::kPlayback)) {
+        throw Failure(403, "you may not see this camera");
+    }
+    try {
+        return SuccessAnswer(Describe(
+            store::Marks(context.Records()).Add(*kind, camera, start_s, length_s, TextOf(Find(parameters, "text")))));
+    } catch (const store::InvalidRecord& error) {
+        throw Failure(400, error.what());
+    } catch (const store::NotFound&) {
+        throw Failure(404, "there is no such camera");
+    }
+}
+
+// The cameras asked for, or all, without those that the caller may not play back.
+std::set<int> CamerasOf(const Parameters& parameters) {
+    const Json::Value asked = Find(parameters, "cameralists");
+    std::set<int> ids;
+    if (!asked.isNull()) {
+        const std::list<int> numbers = String2IntList(asked.asString(), ",");
+        ids.insert(numbers.begin(), numbers.end());
+        const std::set<int> denied = binding::DeniedCameras(store::CameraAccess::kPlayback);
+        std::erase_if(ids, [&denied](int id) { return denied.contains(id); });
+        return ids;
+    }
+    for (const auto& [id, camera] : GetCamMountMap(0, "", true)) {
+        ids.insert(id);
+    }
+    return ids;
+}
+
+std::string List(binding::RequestContext& context, const Parameters& parameters) {
+    store::MarkFilter filter;
+    filter.camera_ids = CamerasOf(parameters);
+    filter.kind = KindOf(parameters);
+    filter.begin_s = NumberOr(parameters, "from", 0);
+    filter.end_s = NumberOr(parameters, "to", base::WallMillis() / 1000 + kMaxAheadSeconds);
+    filter.newest_first = true;
+    const std::int64_t offset = NumberOr(parameters, "offset", 0);
+    const std::int64_t limit = NumberOr(parameters, "limit", 1000);
+    if (filter.end_s <= filter.begin_s || offset < 0 || offset > std::numeric_limits<int>::max() || limit < 1 ||
+        limit > kMaxListed) {
+        throw Failure(400, "from, to, offset or limit is out of its bounds");
+    }
+    filter.offset = static_cast<int>(offset);
+    filter.limit = static_cast<int>(limit);
+    Json::Value data;
+    data["event"] = Json::arrayValue;
+    for (const store::Mark& mark : store::Marks(context.Records()).List(filter)) {
+        data["event"].append(Describe(mark));
+    }
+    return SuccessAnswer(data);
+}
+
+}  // namespace
+
+std::string ServeEvent(binding::RequestContext& context, const ScgiRequest& request, int version,
+                       const std::string& method, const Parameters& parameters) {
+    if (version == 1 && method == "Mark") {
+        RequirePost(request);
+        return MarkIt(context, parameters);
+    }
+    if (version == 1 && method == "List") {
+        return List(context, parameters);
+    }
+    if (version == 1 && method == "Download") {
+        Download(context, KindOf(parameters), Find(parameters, "event").asInt());
+        return "";
+    }
+    throw Failure(404, "no such api, version or method");
+}
+
+}  // namespace lookhaven::webapi
