@@ -1,13 +1,44 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells the methods of event playback apart.
+// Tells the methods of event playback apart, and makes a process the player of its session.
 #include "player/mjpegstreamer/mjpegstreamer.h"
 
+#include <cstdio>
+
+#include "player/mjpegstreamer/player_session.h"
+
 void MjpegStreamHandler::HandleProcess() {
+    g_PlayerSessionId = m_pRequest->GetSessionID();
     const std::string method = m_pRequest->GetAPIMethod();
     if (method == "PlayMjpegEvent") {
         HandlePlayEvent();
     } else if (method == "PlayMjpegEventNoFrameId") {
         HandlePlayEventNoFrameId();
     }
+}
+
+bool MjpegStreamHandler::TakeSession(const char* func) {
+    if (!SetupPlayerSignals()) {
+        LH_TRACE_AT(LOG_CATEG_PLAYER, LOG_LEVEL_ERR, kMjpegStreamerSource, __LINE__, func,
+                    "Failed to setup signal handler.\n");
+        SetErrorCode(LH_WEBAPI_ERR_RESOURCE, "", "");
+        return false;
+    }
+    if (g_PlayerSessionId.empty()) {
+        LH_TRACE_AT(LOG_CATEG_PLAYER, LOG_LEVEL_ERR, kMjpegStreamerSource, __LINE__, func,
+                    "Failed to get session ID.\n");
+    } else if (!WritePlayerPidFile()) {
+        LH_TRACE_AT(LOG_CATEG_PLAYER, LOG_LEVEL_ERR, kMjpegStreamerSource, __LINE__, func,
+                    "Failed to write pid file.\n");
+    } else {
+        return true;
+    }
+    SetErrorCode(LH_WEBAPI_ERR_RESOURCE, "", "");
+    PrintWarningRedirect();
+    return false;
+}
+
+void PrintWarningRedirect() {
+    // Its line feed ends the empty line that ends the head.
+    std::puts("Location: /webman/3rdparty/Lookhaven/resources/images/2x/components/icon_indicator_warning.png\r\n\r");
 }

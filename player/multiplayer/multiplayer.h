@@ -3,7 +3,14 @@
 // Search for recorded events of several cameras.
 #pragma once
 
+#include <map>
+#include <set>
+
+#include "platform/camera/camgroup.h"
 #include "webapi/include/lhwebapihandler.h"
+
+// The source that the search's log lines name.
+inline constexpr char kMultiPlayerSource[] = "multiplayer";
 
 class MultiPlayerHandler : public LHHandlerBase<MultiPlayerHandler> {
   public:
@@ -13,5 +20,22 @@ class MultiPlayerHandler : public LHHandlerBase<MultiPlayerHandler> {
     void HandleProcess();
     // Each ends with an answer on the response.
     void HandleEnumEvent();
+    // At most 128 days: a larger "day_count" is taken as 128.
     void HandleSearchAvaiDate();
+
+  private:
+    // What a search may look at: the cameras of the group, or of the mount without the denied ones when no group is asked
+    // for. A group's own cameras are not filtered here. func: whom the log lines name.
+    struct CamChoice {
+        int m_GroupId;
+        int m_MountId;
+        const std::set<int>& m_DeniedCams;
+        const std::set<int>& m_DeniedGroups;
+        const char* m_szFunc;
+    };
+
+    // Each returns false after a log line and an error: for a user without a profile, for a group that the user may not
+    // see or that does not exist.
+    bool CheckProfile(const PrivProfile& profile, unsigned int uid, const char* func);
+    bool ChooseCameras(const CamChoice& choice, std::map<int, Camera>& cameras);
 };

@@ -35,9 +35,15 @@ ShmStreamFifo* AudioRing() {
 
 }  // namespace lookhaven::test
 
-Camera::Camera() {
-    std::memset(static_cast<void*>(this), 0, sizeof *this);
-}
+Camera::Camera()
+    : m_Id(0),
+      m_szName{},
+      m_blEnabled(false),
+      m_VideoType(0),
+      m_LiveProfile(0),
+      m_StreamNo{},
+      m_blPtz(false),
+      m_blAudio(false) {}
 int Camera::Load(int camId, int serverId, int archiveId) {
     Call("Load", camId, serverId, archiveId);
     const auto found = Script().cameras.find(camId);
@@ -52,6 +58,9 @@ CAM_PROFILE_TYPE Camera::GetLiveProfile() const {
 }
 int Camera::GetUiStreamNo(CAM_PROFILE_TYPE profile) const {
     return Call("GetUiStreamNo", profile), 10 * m_Id + profile;
+}
+std::string Camera::GetStoragePath() const {
+    return "/cam" + std::to_string(m_Id);
 }
 
 std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds, const std::string& deniedIds,

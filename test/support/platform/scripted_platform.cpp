@@ -24,7 +24,7 @@ struct VEXO::APIResponse::Context {};
 struct PrivProfile::Data {
     int id;
     int privilege;
-    std::set<int> denied;
+    std::set<int> denied, muted, denied_groups;
     ~Data() {
         if (lookhaven::test::CurrentPlatform() != nullptr && lookhaven::test::Script().watched_mutex != nullptr) {
             lookhaven::test::Script().Record("free profile");
@@ -65,7 +65,7 @@ ScriptedPlatform::ScriptedPlatform() {
 ScriptedPlatform::~ScriptedPlatform() {
     current = nullptr;
     g_pDbgLogCfg = nullptr;
-    for (const int signal : {SIGINT, SIGQUIT, SIGTERM, SIGPIPE}) {
+    for (const int signal : {SIGINT, SIGQUIT, SIGTERM, SIGPIPE, SIGUSR1, SIGUSR2}) {
         std::signal(signal, SIG_DFL);
     }
     pthread_mutex_destroy(&common_cfg.m_Mutex);
@@ -138,7 +138,13 @@ APIRequest::APIRequest(Context& context) : m_pContext(&context) {}
 Json::Value APIRequest::GetParam(const std::string& name, const Json::Value& defaultValue) const {
     Call("GetParam", name, Text(defaultValue));
     const auto found = Script().params.find(name);
-    return found == Script().params.end() ? defaultValue : found->second;
+    if (found != Script().params.end()) {
+        return found->second;
+    }
+    // The framework takes a text for JSON when it is nothing else, a default too.
+    const bool is_number = defaultValue.isString() && !defaultValue.asString().empty() &&
+                           defaultValue.asString().find_first_not_of("-0123456789") == std::string::npos;
+    return is_number ? Json::Value(std::stoi(defaultValue.asString())) : defaultValue;
 }
 std::string APIRequest::GetAPIMethod() const {
     return Call("GetAPIMethod"), Script().method;
@@ -150,7 +156,7 @@ std::string APIRequest::GetLoginUserName() const {
     return Call("GetLoginUserName"), Script().user_name;
 }
 std::string APIRequest::GetSessionID() const {
-    return Call("GetSessionID"), "5e55";
+    return Call("GetSessionID"), Script().session_id;
 }
 std::string APIRequest::GetRemoteIP() const {
     return Call("GetRemoteIP"), "192.0.2.9";
@@ -217,7 +223,10 @@ int PrivProfile::GetPrivilege() const {
     return m_pData->privilege;
 }
 std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const {
-    return Call("GetInaCamIdSet", type, withHidden), m_pData->denied;
+    return Call("GetInaCamIdSet", type, withHidden), type == CAM_PRIV_AUDIO ? m_pData->muted : m_pData->denied;
+}
+std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
+    return Call("GetInaPrivPerCamGrpIdSet", type), m_pData->denied_groups;
 }
 void PrivProfile::UpdateByJson(const Json::Value& privData) {
     Call("UpdateByJson", Text(privData));
@@ -225,7 +234,8 @@ void PrivProfile::UpdateByJson(const Json::Value& privData) {
 PrivProfile PrivProfileGetByUid(unsigned int uid) {
     Call("PrivProfileGetByUid", uid);
     return PrivProfile(std::shared_ptr<const PrivProfile::Data>(
-        new PrivProfile::Data{Script().profile_id, Script().privilege, Script().denied_cameras}));
+        new PrivProfile::Data{Script().profile_id, Script().privilege, Script().denied_cameras, Script().muted_cameras,
+                              Script().denied_groups}));
 }
 
 void LHPrintf(LOG_TYPE, const char* categName, const char* levelName, const char* file, int line, const char* func,
@@ -240,7 +250,7 @@ void LHPrintf(LOG_TYPE, const char* categName, const char* levelName, const char
     Script().Record(std::string("log ") + text);
 }
 template <>
-LHEnum2StrMap<LOG_CATEG>::LHEnum2StrMap() : m_Names{{LOG_CATEG_LIVEVIEW, "liveview"}} {}
+LHEnum2StrMap<LOG_CATEG>::LHEnum2StrMap() : m_Names{{LOG_CATEG_LIVEVIEW, "liveview"}, {LOG_CATEG_PLAYER, "player"}} {}
 // Leaves LOG_LEVEL_WARN out: a value without a name.
 template <>
 LHEnum2StrMap<LOG_LEVEL>::LHEnum2StrMap()

@@ -21,6 +21,7 @@
 #include "platform/live/commoncfg.h"
 #include "platform/live/livestream.h"
 #include "platform/log/dbglogcfg.h"
+#include "platform/recording/event.h"
 #include "platform/webapi/apirequest.h"
 #include "platform/webapi/apiresponse.h"
 
@@ -66,7 +67,7 @@ class ScriptedPlatform {
     std::vector<LogLine> logs;
     std::function<void(const std::string& call)> on_call;
 
-    std::string method;
+    std::string method, session_id = "5e55";
     std::map<std::string, Json::Value> params;
     std::map<std::string, std::string> cookies;
     bool is_authorized = false, has_app_priv = false, is_admin = false, has_user_priv = false;
@@ -77,7 +78,7 @@ class ScriptedPlatform {
     int owner_host = 0;
 
     int profile_id = 1, privilege = 2;
-    std::set<int> denied_cameras;
+    std::set<int> denied_cameras, muted_cameras, denied_groups;
 
     std::map<int, Camera> cameras;  // for Load
     std::list<Camera> camera_list;  // for GetCamLocalList
@@ -92,6 +93,21 @@ class ScriptedPlatform {
     std::optional<ScriptedFrame> newest_key_frame;
     std::string video_codec = "H264", audio_codec = "AAC", video_extra = "V", audio_extra = "A";
     const void* audio_position = nullptr;  // the one that reads the audio ring
+
+    std::map<int, Event> events;  // for Load, whatever the kind
+    bool has_file = true;         // under any name but the empty one
+    int init_result = 0, frame_info_result = 0;
+    float frame_rate = 10;
+    int frame_count = 100;
+    std::set<int> broken_frames;
+    int client_number = -1;  // what the client set on a player's channel
+    int progress_result = 0;
+    bool has_memory = true;  // for a block of 2 MiB
+
+    std::list<Event> found_events;
+    std::map<int, Camera> group_cameras, mount_cameras;
+    int group_result = 0, rec_log_result = 0;
+
     LHShmCommonCfg common_cfg;
     bool has_common_cfg = true;
     DbgLogCfg log_cfg = {};
@@ -112,6 +128,9 @@ ShmStreamFifo* AudioRing();
 
 // A camera of one stream per profile: 10 · id + profile.
 Camera MakeCamera(int id, int video_type, bool enabled = true);
+
+// A recorded event with a file of its own.
+Event MakeEvent(int id, int start, int end, int rec_method = REC_METHOD_CONTINUOUS);
 
 // Standard output while it exists goes to a file.
 class StdoutCapture {

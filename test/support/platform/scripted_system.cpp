@@ -32,6 +32,7 @@ int __real_fflush(std::FILE*);
 int __real_feof(std::FILE*);
 int __real_ferror(std::FILE*);
 int __real_shmdt(const void*);
+void* __real_malloc(std::size_t);
 int __real_pthread_mutex_lock(pthread_mutex_t*);
 int __real_pthread_mutex_unlock(pthread_mutex_t*);
 int __real_pthread_mutex_destroy(pthread_mutex_t*);
@@ -81,6 +82,11 @@ int __wrap_shmdt(const void* segment) {
         return __real_shmdt(segment);
     }
     return Call(segment == lookhaven::test::AudioRing() ? "audio shmdt" : "shmdt"), 0;
+}
+void* __wrap_malloc(std::size_t size) {
+    constexpr std::size_t kPicture = 2097152;
+    const bool has_memory = size != kPicture || CurrentPlatform() == nullptr || Script().has_memory;
+    return has_memory ? __real_malloc(size) : nullptr;
 }
 int __wrap_pthread_mutex_lock(pthread_mutex_t* mutex) {
     RecordMutex("lock", mutex);

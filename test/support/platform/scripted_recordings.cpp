@@ -1,0 +1,178 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The platform's events, recordings and pacing on a script. The picture of frame 7 is "P7", its time 70 ms.
+#include "platform/recording/event.h"
+#include "platform/recording/jpegextractor.h"
+#include "platform/recording/pacing.h"
+#include "test/support/platform/record.h"
+
+using lookhaven::test::Call;
+using lookhaven::test::Script;
+
+namespace lookhaven::test {
+
+Event MakeEvent(int id, int start, int end, int rec_method) {
+    Event event;
+    event.m_Id = id;
+    event.m_StartTm = start;
+    event.m_EndTm = end;
+    event.m_RecMethod = rec_method;
+    event.m_blSaved = true;
+    event.m_FullPath = "/rec/" + std::to_string(id);
+    event.m_AudFmt = "AAC";
+    return event;
+}
+
+}  // namespace lookhaven::test
+
+namespace {
+
+int Find(const char* call, int eventId, int mountId, int serverId, int archiveId, Event& event) {
+    Call(call, eventId, mountId, serverId, archiveId);
+    const auto found = Script().events.find(eventId);
+    if (found == Script().events.end()) {
+        return -1;
+    }
+    event = found->second;
+    return 0;
+}
+
+}  // namespace
+
+Event::Event()
+    : m_Id(0),
+      m_CamId(0),
+      m_StartTm(0),
+      m_EndTm(0),
+      m_FrameCount(0),
+      m_VdoType(0),
+      m_RecMethod(0),
+      m_ImgW(0),
+      m_ImgH(0),
+      m_blSaved(false),
+      m_blRecording(false),
+      m_blArchived(false),
+      m_Size(0) {}
+int Event::Load(int eventId, int mountId, int serverId, int archiveId) {
+    return Find("Event::Load", eventId, mountId, serverId, archiveId, *this);
+}
+bool Event::IsSaved() const {
+    return m_blSaved;
+}
+std::string Event::GetFullPath() const {
+    return m_FullPath;
+}
+int Event::GetId() const {
+    return m_Id;
+}
+int Event::GetIdOnRecServer() const {
+    return m_Id + 1000;
+}
+std::string Event::GetPath() const {
+    return m_Path;
+}
+int Event::GetStartTm() const {
+    return m_StartTm;
+}
+int Event::GetEndTm() const {
+    return m_EndTm;
+}
+int Event::GetFrameCount() const {
+    return m_FrameCount;
+}
+int Event::GetVdoType() const {
+    return m_VdoType;
+}
+int Event::GetRecMethod() const {
+    return m_RecMethod;
+}
+std::string Event::GetAudFmt() const {
+    return m_AudFmt;
+}
+int Event::GetImgW() const {
+    return m_ImgW;
+}
+int Event::GetImgH() const {
+    return m_ImgH;
+}
+bool Event::GetRecording() const {
+    return m_blRecording;
+}
+bool Event::GetArchived() const {
+    return m_blArchived;
+}
+std::uint64_t Event::GetSize() const {
+    return m_Size;
+}
+bool Event::IsOriginalView() const {
+    return m_CamId == 8;  // the script's fisheye
+}
+int AlertEvent::Load(int eventId, int mountId, int serverId, int archiveId) {
+    return Find("AlertEvent::Load", eventId, mountId, serverId, archiveId, *this);
+}
+PosEvent::PosEvent() = default;
+int PosEvent::Load(int eventId, int mountId, int serverId, int archiveId) {
+    return Find("PosEvent::Load", eventId, mountId, serverId, archiveId, m_Footage);
+}
+bool PosEvent::IsSaved() const {
+    return m_Footage.IsSaved();
+}
+std::string PosEvent::GetFullPath() const {
+    return m_Footage.GetFullPath();
+}
+int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type) {
+    return Call("DoEventTimelyPlay", event.m_Id, type), 0;
+}
+bool IsFileExist(const std::string& path) {
+    return Call("IsFileExist", path), Script().has_file && !path.empty();
+}
+
+struct JpegExtractor::Recording {};
+JpegExtractor::JpegExtractor() = default;
+JpegExtractor::~JpegExtractor() = default;
+int JpegExtractor::Init(const std::string& path) {
+    return Call("Init", path), Script().init_result;
+}
+int JpegExtractor::GetFrameInfo(__tag_JPEG_FRAME_INFO& info) {
+    info = {Script().frame_rate, Script().frame_count};
+    return Call("GetFrameInfo"), Script().frame_info_result;
+}
+int JpegExtractor::ReadFrame(int index, unsigned char* buffer, int& length) {
+    Call("ReadFrame", index, length);
+    if (index < 0 || index >= Script().frame_count || Script().broken_frames.count(index) != 0) {
+        return -1;
+    }
+    length = static_cast<int>(("P" + std::to_string(index)).copy(reinterpret_cast<char*>(buffer), 16));
+    return 0;
+}
+int JpegExtractor::GetFrameIdx(int timeMs) {
+    return Call("GetFrameIdx", timeMs), timeMs < 0 ? -1 : timeMs / 10;
+}
+int JpegExtractor::GetTimeMS(int index) {
+    return index * 10;
+}
+
+DelayTimer::DelayTimer(int delayUs) : m_DelayUs(delayUs), m_DueUs(0) {
+    Call("DelayTimer", delayUs);
+}
+void DelayTimer::SetDelayTime(int delayUs) {
+    Call("SetDelayTime", delayUs);
+}
+void DelayTimer::BeginTiming() {
+    Call("BeginTiming");
+}
+void DelayTimer::Delay() {
+    Call("Delay");
+}
+
+struct ProgressIndicator::Channel {};
+ProgressIndicator::ProgressIndicator(long long key, bool create, bool owner) {
+    Call("ProgressIndicator", key, create, owner);
+}
+ProgressIndicator::~ProgressIndicator() = default;
+int ProgressIndicator::Set(int value) {
+    return Call("Set", value), Script().progress_result;
+}
+int ProgressIndicator::Get() {
+    return Call("Get"), Script().client_number;
+}

@@ -1,0 +1,361 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Event search: which days and seconds are marked, what is asked in which order, who is turned away.
+#include <climits>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "player/multiplayer/multiplayer.h"
+#include "player/multiplayer/time_zone_keys.h"
+#include "test/support/platform/scripted_platform.h"
+
+using lookhaven::test::Calls;
+using lookhaven::test::MakeCamera;
+using lookhaven::test::MakeEvent;
+using lookhaven::test::operator+;
+using lookhaven::test::ScriptedPlatform;
+using testing::ElementsAre;
+using Script = std::function<void(ScriptedPlatform&)>;
+
+namespace {
+
+constexpr int kDay = 86400;
+
+// A search of cameras 2 and 4 by a user who may not see 9 and 12 nor group 6.
+struct Search {
+    explicit Search(const char* method) {
+        platform.method = method;
+        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = LOG_LEVEL_ERR;
+        platform.denied_cameras = {12, 9};
+        platform.denied_groups = {6};
+        for (const int id : {2, 4}) {
+            platform.mount_cameras[id] = MakeCamera(id, CAM_VIDEO_H265);
+        }
+        platform.group_cameras[12] = MakeCamera(12, CAM_VIDEO_MJPEG);
+        platform.params = {{"start", 1000000}, {"from", 1000000}, {"to", 1000060}, {"cameralists", "2"}};
+    }
+    void Run() { MultiPlayerHandler(platform.Request(), platform.Response()).HandleProcess(); }
+    // The calls that begin with the text.
+    Calls All(const std::string& text) const {
+        Calls found;
+        std::copy_if(platform.calls.begin(), platform.calls.end(), std::back_inserter(found),
+                     [&](const auto& call) { return call.rfind(text, 0) == 0; });
+        return found;
+    }
+
+    ScriptedPlatform platform;
+};
+
+const Calls kProfile = {"GetLoginUID()", "PrivProfileGetByUid(7)"};
+const Calls kMount = {"GetInaPrivPerCamGrpIdSet(2)", "GetCamMountMap(3,9,12,1)"};
+
+TEST(SearchAvaiDate, AsksInOrder) {
+    Search search("SearchAvaiDate");
+    search.platform.params["mount_id"] = 3;
+    search.Run();
+    EXPECT_EQ(search.platform.calls,
+              (Calls({"GetAPIMethod()", "GetParam(mount_id,0)", "GetParam(day_count,1)", "GetParam(start,0)",
+                      "GetParam(camGrpId,0)"}) +
+               kProfile + Calls{"GetInaCamIdSet(2,1)"} + kMount +
+               Calls{"GetParam(cameralists,\"\")", "EventListGetAll(3,0,1000000,1086400,2,99,-1,-1,camera_id)",
+                     "SetSuccess({\"available_day\":[0],\"search_time\":1000000})"}));
+}
+
+struct DaysRow {
+    const char* name;
+    Json::Value start;
+    int day_count;
+    std::vector<std::pair<int, int>> spans;  // of events
+    const char* days;                        // "null" or a digit for each
+};
+
+const DaysRow kDays[] = {
+    {"first and last second of a day", 0, 4, {{kDay, 2 * kDay - 1}}, "0100"},
+    {"across midnight", 0, 4, {{kDay - 1, kDay}, {3 * kDay + 5, 3 * kDay + 6}}, "1101"},
+    {"began before", 1000000, 3, {{900000, 1000000 + kDay}}, "110"},
+    {"ends after", 1000000, 3, {{1000000 + 2 * kDay, 2000000}}, "001"},
+    {"ended less than a day before", 1000000, 2, {{900000, 1000000 - kDay + 1}}, "10"},
+    {"ended a day before", 1000000, 2, {{900000, 1000000 - kDay}}, "00"},
+    {"begins after", 1000000, 2, {{1000000 + 2 * kDay, 2000000}}, "00"},
+    {"ends before it begins", 0, 3, {{2 * kDay, kDay}}, "000"},
+    {"no days", 0, 0, {{0, kDay}}, "null"},
+    {"fewest days", 0, INT_MIN, {{INT_MIN, INT_MAX}}, "null"},
+    {"over the wrap of time", INT_MAX - 10, 2, {{INT_MIN + 100, INT_MIN + 200}}, "10"},
+    {"half the time apart", INT_MIN, 2, {{INT_MAX, INT_MAX}}, "10"},
+    {"all the time there is", 0, 2, {{INT_MIN, INT_MAX}}, "11"},
+};
+
+TEST(SearchAvaiDate, MarksDays) {
+    for (const auto& row : kDays) {
+        SCOPED_TRACE(row.name);
+        Search search("SearchAvaiDate");
+        search.platform.params["start"] = row.start;
+        search.platform.params["day_count"] = row.day_count;
+        for (const auto& [begin, end] : row.spans) {
+            search.platform.found_events.push_back(MakeEvent(1, begin, end));
+        }
+        search.Run();
+        std::string days;
+        for (const char* day = row.days; *day == '0' || *day == '1'; ++day) {
+            days += std::string(days.empty() ? "" : ",") + *day;
+        }
+        EXPECT_EQ(search.platform.calls.back(),
+                  "SetSuccess({\"available_day\":" + (days.empty() ? "null" : "[" + days + "]") +
+                      ",\"search_time\":" + row.start.asString() + "})");
+        EXPECT_EQ(search.All("EventListGetAll").size(), 1U) << "asked even for no days";
+    }
+}
+
+TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
+    struct Row {
+        int start, day_count;
+        std::ptrdiff_t slots;
+        const char* span;  // asked for
+    };
+    const Row rows[] = {
+        {0, 128, 128, "0,11059200"},     {0, 129, 128, "0,11059200"},
+        {0, INT_MAX, 128, "0,11059200"}, {INT_MAX, 1, 1, "2147483647,-2147397249"},
+        {5, INT_MIN, 0, "5,5"},          {5, -1, 0, "5,-86395"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.day_count);
+        Search search("SearchAvaiDate");
+        search.platform.params["start"] = row.start;
+        search.platform.params["day_count"] = row.day_count;
+        search.platform.found_events = {MakeEvent(1, 0, INT_MAX)};
+        search.Run();
+        EXPECT_THAT(search.All("EventListGetAll"),
+                    ElementsAre("EventListGetAll(0,0," + std::string(row.span) + ",2,99,-1,-1,camera_id)"));
+        const std::string& answer = search.platform.calls.back();
+        const std::string days = answer.substr(0, answer.find(']'));
+        EXPECT_EQ(days.find('[') == std::string::npos ? 0 : std::count(days.begin(), days.end(), ',') + 1, row.slots);
+    }
+}
+
+TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
+    struct Row {
+        const char* list;
+        const char* ids;  // "" when nothing is asked
+    };
+    const Row rows[] = {
+        {"", ""},     {",,", ""}, {"2,4", "2+4"}, {"4,2,4", "2+4"},      {"1,,x,2", "2"}, {"2x, 4", "2+4"},
+        {"9,12", ""}, {"5", ""},  {"-2", ""},     {"4294967298,4", "4"}, {"2", "2"},      {"99999999999999999999", ""},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.list);
+        Search search("SearchAvaiDate");
+        search.platform.params["cameralists"] = row.list;
+        search.platform.mount_cameras[5];  // a record without an id
+        search.platform.mount_cameras[0] = MakeCamera(0, 1);
+        search.Run();
+        const std::string ids = row.ids;
+        EXPECT_EQ(search.All("EventListGetAll"),
+                  ids.empty() ? Calls{} : Calls{"EventListGetAll(0,0,1000000,1086400," + ids + ",99,-1,-1,camera_id)"});
+        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"available_day\":[0],\"search_time\":1000000})");
+    }
+}
+
+struct TurnedAwayRow {
+    const char* name;
+    Script before;
+    std::string log;   // "" for none
+    int code;          // 0: success
+    const char* last;  // call before the answer
+};
+
+TEST(EventSearch, TurnsAway) {
+    const std::string uid = "Failed to load priv profile of Uid[7].\n", span = "Error time duration.\n";
+    const TurnedAwayRow both[] = {
+        {"no profile", [](auto& p) { p.profile_id = 0; }, uid, 401, "PrivProfileGetByUid"},
+        {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, "PrivProfileGetByUid"},
+        {"forbidden group", [](auto& p) { p.params["camGrpId"] = 6; }, "Inaccessible camera group[6].\n", 401,
+         "GetInaPrivPerCamGrpIdSet"},
+        {"forbidden group that is not there", [](auto& p) { p.params["camGrpId"] = 6, p.group_result = 1; },
+         "Inaccessible camera group[6].\n", 401, "GetInaPrivPerCamGrpIdSet"},
+        {"unknown group", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = 1; },
+         "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
+        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 0; }, "", 401,
+         "PrivProfileGetByUid"},
+    };
+    const auto from_to = [](int from, int to) {
+        return [=](ScriptedPlatform& p) { p.params["from"] = from, p.params["to"] = to; };
+    };
+    const TurnedAwayRow only_events[] = {
+        {"no span", from_to(5, 5), span, 401, "PrivProfileGetByUid"},
+        {"negative span of nobody", [](auto& p) { p.params["to"] = 5, p.profile_id = 0; }, span, 401,
+         "PrivProfileGetByUid"},
+        {"32 days", from_to(0, 32 * kDay), "", 0, "FillRecLogMap"},
+        {"more than 32 days", from_to(0, 32 * kDay + 1), span, 401, "PrivProfileGetByUid"},
+        {"as long as can be", from_to(0, INT_MAX), span, 401, "PrivProfileGetByUid"},
+        {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, "PrivProfileGetByUid"},
+        {"the last second", from_to(INT_MAX - 1, INT_MAX), "", 0, "FillRecLogMap"},
+        {"over the wrap of time", from_to(INT_MAX, INT_MIN), "", 0, "FillRecLogMap"},
+    };
+    const auto check = [](const char* method, const TurnedAwayRow& row) {
+        SCOPED_TRACE(std::string(method) + " " + row.name);
+        Search search(method);
+        row.before(search.platform);
+        search.Run();
+        const auto& logs = search.platform.logs;
+        ASSERT_EQ(logs.size(), row.log.empty() ? 0U : 1U);
+        if (!logs.empty()) {
+            EXPECT_EQ(logs[0].text, row.log);
+            EXPECT_EQ(logs[0].file + " " + logs[0].func, std::string("multiplayer Handle") + method);
+        }
+        const auto calls = search.All("");
+        EXPECT_THAT(calls.at(calls.size() - 2 - logs.size()), testing::StartsWith(row.last));
+        EXPECT_THAT(calls.back(), row.code == 0 ? testing::StartsWith("SetSuccess(")
+                                                : testing::StartsWith("SetError(" + std::to_string(row.code) +
+                                                                      ",{\"param1\":\"\",\"param2\":\"\"})"));
+    };
+    for (const auto& row : both) {
+        check("SearchAvaiDate", row);
+        check("EnumEvent", row);
+    }
+    for (const auto& row : only_events) {
+        check("EnumEvent", row);
+    }
+}
+
+TEST(EventSearch, AGroupDecidesAloneWhichCamerasItHas) {
+    for (const char* method : {"SearchAvaiDate", "EnumEvent"}) {
+        Search search(method);
+        search.platform.params["camGrpId"] = 1;
+        search.platform.params["cameralists"] = "12,2";
+        search.Run();
+        EXPECT_EQ(search.platform.CallsFrom("CamGroup::Load").at(1), "GetCamMap(1)");
+        ASSERT_EQ(search.All("EventListGetAll").size(), 1U) << "a denied camera of the group, none outside it";
+        EXPECT_THAT(search.All("EventListGetAll")[0], testing::HasSubstr(",12,"));
+    }
+}
+
+TEST(EventSearch, TracesTheRequestAtLevel5) {
+    for (const int level : {4, 5}) {
+        Search search("Other");
+        search.platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = level;
+        search.platform.params[""]["a"] = 1;
+        search.Run();
+        EXPECT_EQ(search.All("log"),
+                  (level == 4 ? Calls{} : Calls{"log Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
+        EXPECT_EQ(search.All("").size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
+    }
+}
+
+TEST(EnumEvent, AsksInOrder) {
+    Search search("EnumEvent");
+    search.platform.params["mount_id"] = 3;
+    search.platform.params["reason"] = 259;
+    search.Run();
+    EXPECT_EQ(search.platform.calls,
+              (Calls({"GetAPIMethod()", "GetParam(mount_id,0)", "GetParam(camGrpId,0)", "GetParam(from,0)",
+                      "GetParam(to,0)", "GetParam(interval,5)", "GetParam(recording,false)", "GetParam(reason,0)",
+                      "GetParam(cameralists,\"\")"}) +
+               kProfile + Calls{"GetInaCamIdSet(2,1)", "GetInaCamIdSet(8,1)"} + kMount +
+               Calls{"String2IntList(2,,)", "EventListGetAll(3,-1,1000000,1000060,2,3,2,6,camera_id)",
+                     "ReadRecLog(/cam2,1000000,60)", "FillRecLogMap(log," + std::string(60, '.') + ",5)",
+                     "SetSuccess({\"camera\":[{\"camera_id\":2,\"event\":[],\"event_map\":\"map\",\"total\":0}]})"}));
+}
+
+TEST(EnumEvent, DescribesEachEvent) {
+    Search search("EnumEvent");
+    Event event = MakeEvent(31, 1000001, 1000002, 7);
+    event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
+    event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
+    search.platform.found_events = {event};
+    search.platform.muted_cameras = {4};
+    search.platform.rec_log_result = 1;
+    search.platform.params["recording"] = true;
+    search.platform.params["cameralists"] = "4,1,9,0,2,2";
+    search.Run();
+    const auto entry = [](const char* audio, const char* id) {
+        return std::string("{\"camera_id\":") + id + ",\"event\":[{\"archived\":false,\"audio_format\":\"" + audio +
+               "\",\"event_size\":1.5,\"fisheye_origin_view\":true,\"frameCount\":33,\"frame_count\":33,\"id\":31,"
+               "\"id_on_RecServer\":1031,\"img_height\":360,\"img_width\":640,\"is_recording\":true,"
+               "\"name\":\"2/x.mkv\",\"record_type\":7,\"start\":1000001,\"startTime\":1000001,\"stop\":1000002,"
+               "\"stopTime\":1000002,\"video_type\":3}],\"total\":1}";
+    };
+    EXPECT_EQ(search.platform.calls.back(),
+              "SetSuccess({\"camera\":[" + entry("", "4") + "," + entry("AAC", "2") + "," + entry("AAC", "2") + "]})");
+    EXPECT_THAT(search.All("EventListGetAll"), ElementsAre("EventListGetAll(0,-1,1000000,1000060,4,0,0,6,camera_id)",
+                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)",
+                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)"));
+}
+
+TEST(EnumEvent, OfNoCameraIsAnEmptyList) {
+    for (const char* list : {"", "7,8"}) {
+        Search search("EnumEvent");
+        search.platform.params["cameralists"] = list;
+        search.Run();
+        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"camera\":[]})");
+    }
+}
+
+struct CoverageRow {
+    const char* name;
+    int from, to;
+    std::vector<Event> events;
+    const char* seconds;
+};
+
+TEST(EnumEvent, MarksCoverage) {
+    const CoverageRow rows[] = {
+        {"inside", 100, 110, {MakeEvent(1, 102, 105)}, "..XXX....."},
+        {"to the end", 100, 110, {MakeEvent(1, 107, 200)}, ".......XXX"},
+        {"its whole length from the begin on", 100, 110, {MakeEvent(1, 95, 102)}, "XXXXXXX..."},
+        {"began long before", 100, 110, {MakeEvent(1, 10, 102)}, "XXXXXXXXXX"},
+        {"after the span", 100, 110, {MakeEvent(1, 110, 120)}, ".........."},
+        {"ended before it began", 100, 110, {MakeEvent(1, 105, 104)}, ".........."},
+        {"kinds that mark",
+         100,
+         110,
+         {MakeEvent(1, 100, 101, 1), MakeEvent(1, 101, 102, 2), MakeEvent(1, 102, 103, 5), MakeEvent(1, 103, 104, 6),
+          MakeEvent(1, 104, 105, 10), MakeEvent(1, 105, 106, 257)},
+         "XXXXXX...."},
+        {"kinds that do not",
+         100,
+         110,
+         {MakeEvent(1, 100, 101, 0), MakeEvent(1, 101, 102, 7), MakeEvent(1, 102, 103, 9), MakeEvent(1, 103, 104, 11),
+          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1)},
+         ".........."},
+        {"from the lowest to the highest time", 100, 110, {MakeEvent(1, INT_MIN, INT_MAX)}, ".........."},
+        {"over the wrap of time", INT_MAX - 4, INT_MAX, {MakeEvent(1, INT_MAX - 2, INT_MIN)}, "..XX"},
+        {"half the time away", INT_MIN, INT_MIN + 4, {MakeEvent(1, INT_MAX, INT_MIN + 1)}, "XX.."},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.name);
+        Search search("EnumEvent");
+        search.platform.params["from"] = row.from;
+        search.platform.params["to"] = row.to;
+        search.platform.params["interval"] = -3;
+        search.platform.params["cameralists"] = "2,4";
+        search.platform.found_events = {row.events.begin(), row.events.end()};
+        search.platform.on_call = [&](const std::string& call) {
+            if (call.rfind("SetSuccess", 0) != 0 && call.rfind("EventListGetAll", 0) == 0 &&
+                call.find(",4,") != std::string::npos) {
+                search.platform.found_events.clear();
+            }
+        };
+        search.Run();
+        EXPECT_THAT(
+            search.All("FillRecLogMap"),
+            ElementsAre("FillRecLogMap(log," + std::string(row.seconds) + ",-3)",
+                        "FillRecLogMap(log," + std::string(static_cast<std::size_t>(row.to - row.from), '.') + ",-3)"))
+            << "and nothing stays for the next camera";
+    }
+}
+
+TEST(TimeZoneKeys, AscendAndAreWrittenAlike) {
+    int last = -721;
+    for (const std::string& key : kTimeZoneKeys) {
+        const bool is_west = key.at(4) == 'n';
+        const int minutes = (is_west ? -1 : 1) * std::stoi(key.substr(is_west ? 5 : 4));
+        EXPECT_EQ(key, (minutes < 0 ? "utc_n" : "utc_") + std::to_string(std::abs(minutes)));
+        EXPECT_GT(minutes, last);
+        EXPECT_EQ(minutes % 15, 0);
+        last = minutes;
+    }
+    EXPECT_EQ(last, 840);
+}
+
+}  // namespace
