@@ -9,6 +9,7 @@
 
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/recording_options.h"
 #include "standalone/media/probe.h"
 #include "standalone/store/text.h"
 
@@ -18,6 +19,8 @@ namespace {
 
 using store::Camera;
 using store::Cameras;
+using store::RecordingPlan;
+using store::RecordingPlans;
 using store::VideoType;
 
 constexpr std::chrono::seconds kProbeLimit{10};
@@ -27,9 +30,10 @@ struct Request {
     std::string target;  // of a probe: an id or an address
     std::optional<std::string> account;
     CameraOptions options;
+    RecordingOptions recording;
 };
 
-Json::Value ToData(const Camera& camera) {
+Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
     Json::Value data;
     data["id"] = camera.id;
     data["name"] = camera.name;
@@ -47,6 +51,7 @@ Json::Value ToData(const Camera& camera) {
         entry["fps"] = profile.fps;
         data["profiles"].append(entry);
     }
+    data["recording"] = PlanData(plan);
     return data;
 }
 
@@ -110,6 +115,12 @@ void FindOut(Camera& camera, const Request& request, const std::optional<store::
     }
 }
 
+void SetPlan(store::Store& store, int id, const Request& request, const RecordingPlan& plan) {
+    if (request.recording.IsGiven()) {
+        RecordingPlans(store).Set(id, plan);
+    }
+}
+
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
@@ -117,13 +128,16 @@ void Add(const Console& console, const Request& request) {
     request.options.ApplyTo(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
     FindOut(camera, request, credentials);
+    RecordingPlan plan;
+    request.recording.ApplyTo(plan);
     camera.id = cameras.Add(camera);
     if (credentials) {
         cameras.SetCredentials(camera.id, credentials);
     }
+    SetPlan(store, camera.id, request, plan);
     console.Answer("The camera " + camera.name + " has the id " + std::to_string(camera.id) + " and sends " +
                        VideoTypeName(camera.video_type) + ".",
-                   ToData(camera));
+                   ToData(camera, plan));
 }
 
 void Change(const Console& console, const Request& request) {
@@ -137,23 +151,31 @@ void Change(const Console& console, const Request& request) {
     if (live != nullptr && live->source != before.source) {
         FindOut(camera, request, request.account ? credentials : cameras.FindCredentials(camera.id));
     }
+    RecordingPlan plan = RecordingPlans(store).Find(camera.id);
+    request.recording.ApplyTo(plan);
+    SetPlan(store, camera.id, request, plan);
     cameras.Update(camera);
     if (request.account) {
         cameras.SetCredentials(camera.id, credentials);
     }
-    console.Answer("The camera " + std::to_string(camera.id) + " is changed.", ToData(camera));
+    console.Answer("The camera " + std::to_string(camera.id) + " is changed.", ToData(camera, plan));
 }
 
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "state", "video", "can", "live source"}};
+    Rows rows = {{"id", "name", "state", "video", "can", "recorded", "live source"}};
+    const std::map<int, RecordingPlan> plans = RecordingPlans(store).List();
     for (const Camera& camera : Cameras(store).List()) {
-        data.append(ToData(camera));
+        const auto found = plans.find(camera.id);
+        const RecordingPlan plan = found == plans.end() ? RecordingPlan() : found->second;
+        data.append(ToData(camera, plan));
         const std::string can = std::string(camera.ptz ? "move " : "") + (camera.audio ? "hear" : "");
         const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
         rows.push_back({std::to_string(camera.id), camera.name, camera.enabled ? "enabled" : "disabled",
-                        VideoTypeName(camera.video_type), can, live == nullptr ? "none" : live->source});
+                        VideoTypeName(camera.video_type), can,
+                        plan.mode == store::RecordMode::kAlways ? "always" : "never",
+                        live == nullptr ? "none" : live->source});
     }
     console.Answer(Table(rows), data);
 }
@@ -230,6 +252,7 @@ void AddCamera(CLI::App& program, Console& console) {
 
     CLI::App* add = command("add", "Adds a camera", Add);
     request->options.AddTo(*add);
+    request->recording.AddTo(*add);
     add->get_option("--name")->required();
     add->get_option("--source")->required();
     add_account(add, "The camera's account; its password is asked for");
@@ -237,6 +260,7 @@ void AddCamera(CLI::App& program, Console& console) {
     CLI::App* set = command("set", "Changes what is given and leaves the rest", Change);
     set->add_option("id", request->id, "The camera's id")->required();
     request->options.AddTo(*set);
+    request->recording.AddTo(*set);
     add_account(set, "The camera's account, whose password is asked for; empty for none");
 
     group->add_subcommand("list", "Lists the cameras")->callback([&console] { List(console); });

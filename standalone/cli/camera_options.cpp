@@ -103,6 +103,10 @@ void CameraOptions::ApplyTo(Camera& camera) const {
     }
 }
 
+const std::map<std::string, int>& ProfileNames() {
+    return kProfiles;
+}
+
 const char* VideoTypeName(VideoType type) {
     return type == VideoType::kMjpeg ? "MJPEG" : type == VideoType::kH264 ? "H.264" : "H.265";
 }

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <array>
+#include <map>
 #include <optional>
 #include <string>
 
@@ -40,6 +41,9 @@ class CameraOptions {
     std::optional<bool> audio_;
     std::array<ProfileOptions, store::kProfileCount> profiles_;
 };
+
+// The names of the profiles and their numbers.
+const std::map<std::string, int>& ProfileNames();
 
 // "H.264" and so on.
 const char* VideoTypeName(store::VideoType type);

@@ -28,6 +28,10 @@ void AddLog(CLI::App& program, Console& console);
 void AddCamera(CLI::App& program, Console& console);
 void AddUser(CLI::App& program, Console& console);
 void AddDemo(CLI::App& program, Console& console);
+void AddEvent(CLI::App& program, Console& console);
+void AddMount(CLI::App& program, Console& console);
+void AddGroup(CLI::App& program, Console& console);
+void AddVerify(CLI::App& program, Console& console);
 void AddDoctor(CLI::App& program, Console& console);
 
 }  // namespace lookhaven::cli

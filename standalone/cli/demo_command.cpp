@@ -1,10 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven demo setup: four cameras of test patterns and a viewer, to try everything without a camera.
+// lookhaven demo: cameras of test patterns, recorded and grouped, a viewer, and events by the thousand, to try everything
+// without a camera.
 #include <algorithm>
+#include <memory>
 
+#include "standalone/base/clock.h"
 #include "standalone/cli/commands.h"
-#include "standalone/store/cameras.h"
+#include "standalone/cli/demo_events.h"
+#include "standalone/store/events.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/recording_plans.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::cli {
@@ -16,6 +23,9 @@ using store::VideoType;
 
 constexpr const char* kViewer = "viewer";
 constexpr const char* kDeniedCamera = "Parking";
+constexpr const char* kGroup = "Yard";
+constexpr std::int64_t kDemoLimitBytes = std::int64_t{4} << 30;
+constexpr std::size_t kRecordedCameras = 2;
 
 std::vector<Camera> DemoCameras() {
     return {
@@ -47,6 +57,34 @@ int AddMissing(store::Cameras& cameras, const Camera& wanted, const std::vector<
     return cameras.Add(wanted);
 }
 
+// The first cameras are recorded and make a group. Cameras that were there before keep their plan.
+void RecordAndGroup(store::Store& store, const std::vector<int>& ids, int first_added) {
+    store::RecordingPlans plans(store);
+    store::CameraGroup group{0, kGroup, {}};
+    for (const int id : ids) {
+        group.camera_ids.insert(id);
+        if (id >= first_added) {
+            plans.Set(id, {.mode = store::RecordMode::kAlways});
+        }
+    }
+    store::Groups groups(store);
+    const std::vector<store::CameraGroup> known = groups.List();
+    if (std::none_of(known.begin(), known.end(), [](const auto& each) { return each.name == kGroup; })) {
+        groups.Add(group);
+    }
+}
+
+// A trial keeps little. Only where nothing has been recorded yet: a lower limit removes recordings.
+void LimitDefaultMount(store::Store& store) {
+    store::Mounts mounts(store);
+    std::optional<store::Mount> mount = mounts.FindForPlan(0);
+    if (mount && store::Events(store).Content(mount->id).events == 0 &&
+        (mount->max_bytes == 0 || mount->max_bytes > kDemoLimitBytes)) {
+        mount->max_bytes = kDemoLimitBytes;
+        mounts.Update(*mount);
+    }
+}
+
 void Setup(const Console& console) {
     store::Store store = console.OpenStore();
     store::Cameras cameras(store);
@@ -56,9 +94,17 @@ void Setup(const Console& console) {
     const std::vector<Camera> known = cameras.List();
     int added = 0;
     int denied = 0;
+    std::vector<int> recorded;
     for (const Camera& wanted : DemoCameras()) {
         const int id = AddMissing(cameras, wanted, known, added);
         denied = wanted.name == kDeniedCamera ? id : denied;
+        if (recorded.size() < kRecordedCameras) {
+            recorded.push_back(id);
+        }
+    }
+    RecordAndGroup(store, recorded, known.empty() ? 1 : known.back().id + 1);
+    if (known.empty()) {
+        LimitDefaultMount(store);
     }
     if (viewer_missing) {
         users.Deny(users.Add(kViewer, password, store::Privilege::kViewer).id, denied);
@@ -71,13 +117,50 @@ void Setup(const Console& console) {
                    data);
 }
 
+struct EventRequest {
+    int count = 0;
+    int days = 30;
+    bool remove = false;
+};
+
+void MakeEvents(const Console& console, const EventRequest& request) {
+    store::Store store = console.OpenStore();
+    Json::Value data;
+    if (request.remove) {
+        const int removed = store::Events(store).RemoveDemo();
+        data["removed"] = removed;
+        console.Answer("What was made up is gone: " + std::to_string(removed) + " events, alerts and sales.", data);
+        return;
+    }
+    const DemoAmount made = AddDemoEvents(store, request.count, request.days, base::WallMillis() / 1000);
+    data["events_added"] = made.events;
+    data["marks_added"] = made.marks;
+    console.Answer("Made up " + std::to_string(made.events) + " events and " + std::to_string(made.marks) +
+                       " alerts and sales, all without footage.",
+                   data);
+}
+
 }  // namespace
 
 void AddDemo(CLI::App& program, Console& console) {
-    program.add_subcommand("demo", "Test patterns instead of cameras")
-        ->require_subcommand(1)
-        ->add_subcommand("setup", "Adds four cameras and the account viewer, whose password is asked for")
+    CLI::App* demo = program.add_subcommand("demo", "Test patterns instead of cameras")->require_subcommand(1);
+    demo->add_subcommand("setup",
+                         "Adds four cameras, two of them recorded, and the account viewer, whose password is asked "
+                         "for")
         ->callback([&console] { Setup(console); });
+
+    CLI::App* events = demo->add_subcommand("events", "Makes up events for a trial, or removes them");
+    auto request = std::make_shared<EventRequest>();
+    CLI::Option* count = events->add_option("--count", request->count, "How many")->check(CLI::Range(1, 100'000'000));
+    events->add_option("--days", request->days, "Spread over so many days up to now (else 30)")
+        ->check(CLI::Range(1, 10'000));
+    CLI::Option* remove = events->add_flag("--remove", request->remove, "Remove all that was made up")->excludes(count);
+    events->callback([&console, request, count, remove] {
+        if (count->empty() && remove->empty()) {
+            throw Failure(kUsage, "say how many with --count, or --remove: see lookhaven demo events --help");
+        }
+        MakeEvents(console, *request);
+    });
 }
 
 }  // namespace lookhaven::cli

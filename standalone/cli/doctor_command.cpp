@@ -5,17 +5,25 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <iterator>
+#include <system_error>
 
 #include <poll.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
+#include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/units.h"
 #include "standalone/ring/common_config.h"
 #include "standalone/ring/inventory.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
+#include "standalone/upkeep/mount_folder.h"
+#include "standalone/upkeep/recording_state.h"
 
 namespace lookhaven::cli {
 
@@ -72,6 +80,56 @@ Findings CheckStore(const base::Installation& installation) {
     return findings;
 }
 
+// What keeps recordings from being written to the mount.
+Findings CheckMount(store::Store& store, const store::Mount& mount) {
+    const std::string name = "the mount " + mount.name + " at " + mount.path;
+    if (::access(mount.path.c_str(), F_OK) != 0) {
+        return {
+            {name + " is not there", "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path"}};
+    }
+    const auto folder = upkeep::MountFolder::Open(mount.path, mount.id);
+    if (!folder) {
+        return {{name + " is not the folder that was added",
+                 "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path " + mount.path}};
+    }
+    Findings findings;
+    if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
+        findings.push_back({name + " cannot be written by you", "run this as the user who runs the server"});
+    }
+    const upkeep::MountSpace space = folder->Space();
+    if (space.free_bytes < space.ReserveBytes()) {
+        findings.push_back({name + " has only " + FormatSize(space.free_bytes) + " left, recording needs " +
+                                FormatSize(space.ReserveBytes()),
+                            "make room on its disk, or lower its limit with lookhaven mount set"});
+    }
+    const std::int64_t held = store::Events(store).Content(mount.id).size_bytes;
+    if (mount.max_bytes > 0 && held > mount.max_bytes + mount.max_bytes / 10) {
+        findings.push_back(
+            {name + " holds " + FormatSize(held) + " of recordings, above its limit of " + FormatSize(mount.max_bytes),
+             "start the recorder, which removes the oldest; what is archived stays: raise the limit"});
+    }
+    return findings;
+}
+
+Findings CheckMounts(const base::Installation& installation) {
+    Findings findings;
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        const std::vector<store::Mount> mounts = store::Mounts(store).List();
+        if (mounts.empty()) {
+            return {{"there is no mount to record to", "lookhaven init"}};
+        }
+        for (const store::Mount& mount : mounts) {
+            std::ranges::move(mount.enabled ? CheckMount(store, mount) : Findings(), std::back_inserter(findings));
+        }
+    } catch (const store::StoreError&) {
+        return {};  // said of the store already
+    } catch (const std::system_error& error) {
+        findings.push_back({error.what(), "see that the disk works"});
+    }
+    return findings;
+}
+
 // An answer of any kind shows that the host accepts, forks and answers.
 bool HostAnswers(const std::string& path) {
     sockaddr_un address{};
@@ -116,6 +174,23 @@ Findings CheckRecorder(const base::Installation& installation) {
              "start the server with script/server, or read " + installation.LogFolder().string()}};
 }
 
+// What the recorder itself says is in its way.
+Findings CheckRecordings(const base::Installation& installation) {
+    ring::CommonConfig* config = ring::MapCommonConfig(installation);
+    if (config == nullptr || !ring::IsRecorderAlive(*config)) {
+        return {};
+    }
+    Findings findings;
+    for (const upkeep::CameraRecordingState& state : upkeep::ReadRecordingStates(installation)) {
+        if (state.state != upkeep::RecordingState::kReady && state.state != upkeep::RecordingState::kRecording) {
+            findings.push_back(
+                {"camera " + std::to_string(state.camera) + " is not recorded: " + upkeep::NameOf(state.state),
+                 "see to its mount: lookhaven mount list; recording then goes on by itself"});
+        }
+    }
+    return findings;
+}
+
 Findings CheckSegments(const base::Installation& installation) {
     Findings findings;
     for (const ring::SegmentState& segment : ring::ListSegments(installation)) {
@@ -135,10 +210,8 @@ struct Check {
     const char* name;
     Findings (*run)(const base::Installation&);
 };
-constexpr Check kChecks[] = {{"folder", CheckFolder},
-                             {"store", CheckStore},
-                             {"host", CheckHost},
-                             {"recorder", CheckRecorder},
+constexpr Check kChecks[] = {{"folder", CheckFolder},    {"store", CheckStore},       {"mounts", CheckMounts},
+                             {"host", CheckHost},        {"recorder", CheckRecorder}, {"recordings", CheckRecordings},
                              {"segments", CheckSegments}};
 
 void Examine(const Console& console) {

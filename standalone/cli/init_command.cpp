@@ -1,12 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven init: makes a state folder, or brings one up to date.
+#include <cstdint>
+#include <filesystem>
 #include <memory>
 #include <system_error>
 
 #include "standalone/base/debug_log_config.h"
 #include "standalone/cli/commands.h"
+#include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
+#include "standalone/upkeep/mount_folder.h"
 
 namespace lookhaven::cli {
 
@@ -33,15 +37,36 @@ bool AddAdmin(store::Store& store, const std::string& name) {
     return true;
 }
 
+// The folder "recordings" in the state folder, with half of what is free there for a limit: a trial must not fill the disk
+// that the machine itself lives on. False when there is a mount already.
+bool AddDefaultMount(store::Store& store, const base::Installation& installation) {
+    store::Mounts mounts(store);
+    if (!mounts.List().empty()) {
+        return false;
+    }
+    const std::filesystem::path folder = installation.Home() / "recordings";
+    if (std::filesystem::create_directories(folder)) {
+        std::filesystem::permissions(folder, std::filesystem::perms::owner_all);
+    }
+    store::Mount mount;
+    mount.name = "default";
+    mount.path = folder.lexically_normal().string();
+    mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
+    upkeep::MountFolder::Mark(folder, mounts.Add(mount));
+    return true;
+}
+
 void Init(const Console& console, const std::string& admin) {
     const base::Installation installation = MakeFolders(console.HomePath());
     const int steps = store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
+    const bool mount_added = AddDefaultMount(store, installation);
     const bool added = !admin.empty() && AddAdmin(store, admin);
     Json::Value data;
     data["home"] = installation.Home().string();
     data["migrations"] = steps;
     data["admin_added"] = added;
+    data["mount_added"] = mount_added;
     console.Answer("The state folder " + installation.Home().string() + " is ready." +
                        (added           ? "\nThe account " + admin + " may log in."
                         : admin.empty() ? ""

@@ -5,6 +5,7 @@
 #include <new>
 #include <system_error>
 
+#include "standalone/archive/archive_error.h"
 #include "standalone/cli/commands.h"
 #include "standalone/media/source.h"
 
@@ -70,6 +71,10 @@ int Run(int argc, char** argv) {
     AddCamera(program, console);
     AddUser(program, console);
     AddLog(program, console);
+    AddGroup(program, console);
+    AddMount(program, console);
+    AddEvent(program, console);
+    AddVerify(program, console);
     AddDemo(program, console);
     AddDoctor(program, console);
     program.add_subcommand("version", "Says which version this is")->callback([&console] {
@@ -94,6 +99,8 @@ int Run(int argc, char** argv) {
         return Report(console, kUnavailable, error.what());
     } catch (const media::SourceError& error) {
         return Report(console, kUnavailable, std::string("the source cannot be used (") + error.what() + ")");
+    } catch (const archive::ArchiveError& error) {
+        return Report(console, kDataError, error.what());
     } catch (const std::system_error& error) {
         return Report(console, CodeOf(error), error.what());
     } catch (const std::bad_alloc&) {

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <map>
 #include <memory>
+#include <optional>
 
 #include "standalone/cli/commands.h"
 #include "standalone/store/cameras.h"
@@ -26,7 +27,8 @@ const std::map<std::string, CameraAccess> kAccess = {
 struct Request {
     std::string name;
     Privilege privilege = Privilege::kViewer;
-    int camera = 0;
+    std::optional<int> camera;
+    std::optional<int> group;
     std::vector<CameraAccess> kinds;
 };
 
@@ -58,25 +60,32 @@ void Add(const Console& console, const Request& request) {
     console.Answer("The account " + user.name + " may log in as " + PrivilegeName(user.privilege) + ".", ToData(user));
 }
 
+// "live 1 2; audio 2"
+std::string DeniedText(Users& users, int user, std::set<int> (Users::*denied)(int, CameraAccess), Json::Value& data) {
+    std::string text;
+    for (const auto& [name, kind] : kAccess) {
+        data[name] = Json::arrayValue;
+        std::string ids;
+        for (const int id : (users.*denied)(user, kind)) {
+            data[name].append(id);
+            ids += " " + std::to_string(id);
+        }
+        text += ids.empty() ? "" : (text.empty() ? "" : "; ") + name + ids;
+    }
+    return text;
+}
+
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     Users users(store);
     Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "privilege", "denied cameras"}};
+    Rows rows = {{"id", "name", "privilege", "denied cameras", "denied groups"}};
     for (const User& user : users.List()) {
         Json::Value entry = ToData(user);
-        std::string denied;
-        for (const auto& [name, kind] : kAccess) {
-            entry["denied"][name] = Json::arrayValue;
-            std::string ids;
-            for (const int camera : users.DeniedCameras(user.id, kind)) {
-                entry["denied"][name].append(camera);
-                ids += " " + std::to_string(camera);
-            }
-            denied += ids.empty() ? "" : (denied.empty() ? "" : "; ") + name + ids;
-        }
+        rows.push_back({std::to_string(user.id), user.name, PrivilegeName(user.privilege),
+                        DeniedText(users, user.id, &Users::DeniedCameras, entry["denied"]),
+                        DeniedText(users, user.id, &Users::DeniedGroups, entry["denied_groups"])});
         data.append(entry);
-        rows.push_back({std::to_string(user.id), user.name, PrivilegeName(user.privilege), denied});
     }
     console.Answer(Table(rows), data);
 }
@@ -103,24 +112,36 @@ void Remove(const Console& console, const Request& request) {
     console.Answer("The account " + user.name + " is gone.", ToData(user));
 }
 
+void PermitKind(Users& users, int user, const Request& request, bool allow, CameraAccess kind) {
+    if (request.group) {
+        allow ? users.AllowGroup(user, *request.group, {kind}) : users.DenyGroup(user, *request.group, {kind});
+    } else {
+        allow ? users.Allow(user, *request.camera, {kind}) : users.Deny(user, *request.camera, {kind});
+    }
+}
+
 void Permit(const Console& console, const Request& request, bool allow) {
+    if (request.camera.has_value() == request.group.has_value()) {
+        throw Failure(kUsage, "name either a camera or a group: see lookhaven user deny --help");
+    }
     store::Store store = console.OpenStore();
     Users users(store);
     const User user = Require(users, request.name);
-    if (!allow && !store::Cameras(store).Find(request.camera)) {
+    if (!allow && request.camera && !store::Cameras(store).Find(*request.camera)) {
         throw Failure(kNoInput,
-                      "there is no camera " + std::to_string(request.camera) + ": lookhaven camera list names them");
+                      "there is no camera " + std::to_string(*request.camera) + ": lookhaven camera list names them");
     }
     const std::vector<CameraAccess> kinds = request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds;
+    bool still_denied = false;
     for (const CameraAccess kind : kinds) {
-        if (allow) {
-            users.Allow(user.id, request.camera, {kind});
-        } else {
-            users.Deny(user.id, request.camera, {kind});
-        }
+        PermitKind(users, user.id, request, allow, kind);
+        still_denied =
+            still_denied || (allow && request.camera && users.DeniedCameras(user.id, kind).contains(*request.camera));
     }
-    console.Answer("The camera " + std::to_string(request.camera) + (allow ? " is allowed to " : " is denied to ") +
-                       user.name + ".",
+    const std::string subject =
+        request.group ? "group " + std::to_string(*request.group) : "camera " + std::to_string(*request.camera);
+    console.Answer("The " + subject + (allow ? " is allowed to " : " is denied to ") + user.name +
+                       (still_denied ? ", but belongs to a group that is denied." : "."),
                    ToData(user));
 }
 
@@ -140,11 +161,12 @@ void AddUser(CLI::App& program, Console& console) {
     group->add_subcommand("list", "Lists the accounts")->callback([&console] { List(console); });
     command("passwd", "Changes a password and ends the account's sessions", SetPassword);
     command("remove", "Removes an account and ends its sessions", Remove);
-    for (CLI::App* permit :
-         {command("deny", "Denies a camera and ends the account's sessions",
-                  [](const Console&c, const Request&r) { Permit(c, r, false); }),
-          command("allow", "Allows a camera again", [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
-        permit->add_option("camera", request->camera, "The camera's id")->required();
+    for (CLI::App* permit : {command("deny", "Denies a camera or group and ends the account's sessions",
+                                     [](const Console&c, const Request&r) { Permit(c, r, false); }),
+                             command("allow", "Allows a camera or group again",
+                                     [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
+        permit->add_option("camera", request->camera, "The camera's id");
+        permit->add_option("--group", request->group, "A group's id instead: all that its cameras are and will be");
         Choose(permit->add_option("--kind", request->kinds, "What exactly; may be repeated (else everything)"), kAccess)
             ->allow_extra_args(false);
     }

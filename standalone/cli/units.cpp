@@ -1,0 +1,133 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/cli/units.h"
+
+#include <charconv>
+#include <cmath>
+#include <cstdio>
+#include <ctime>
+#include <optional>
+#include <string_view>
+
+#include "standalone/cli/console.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+constexpr std::int64_t kLargestNumber = std::int64_t{1} << 50;
+
+template <typename Number>
+std::optional<Number> AsNumber(std::string_view text) {
+    Number number{};
+    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    const bool whole = error == std::errc() && rest == text.data() + text.size();
+    return whole && number >= 0 && number <= static_cast<Number>(kLargestNumber) ? std::optional(number) : std::nullopt;
+}
+
+// The seconds of a date and a time of day; nothing for one that the calendar does not have.
+std::optional<std::int64_t> AsDate(std::string text) {
+    const bool utc = !text.empty() && text.back() == 'Z';
+    if (utc) {
+        text.pop_back();
+    }
+    for (const char* form :
+         {"%Y-%m-%dT%H:%M:%S", "%Y-%m-%d %H:%M:%S", "%Y-%m-%dT%H:%M", "%Y-%m-%d %H:%M", "%Y-%m-%d"}) {
+        std::tm time{};
+        const char* rest = ::strptime(text.c_str(), form, &time);
+        if (rest == nullptr || *rest != '\0') {
+            continue;
+        }
+        time.tm_isdst = -1;
+        const int day = time.tm_mday;
+        const std::int64_t moment = utc ? ::timegm(&time) : ::mktime(&time);
+        return time.tm_mday == day ? std::optional(moment) : std::nullopt;
+    }
+    return std::nullopt;
+}
+
+}  // namespace
+
+std::int64_t ParseDuration(const std::string& text) {
+    const std::size_t digits = text.find_first_not_of("0123456789");
+    const std::string unit = digits == std::string::npos ? "s" : text.substr(digits);
+    const std::int64_t factor = unit == "s" ? 1 : unit == "m" ? 60 : unit == "h" ? 3600 : unit == "d" ? 86400 : 0;
+    const auto number = AsNumber<std::int64_t>(std::string_view(text).substr(0, digits));
+    if (!number || factor == 0 || *number > kLargestNumber / factor) {
+        throw Failure(kUsage, "a duration looks like 90s, 15m, 2h or 30d");
+    }
+    return *number * factor;
+}
+
+std::int64_t ParseSize(const std::string& text) {
+    constexpr std::string_view kUnits = "KMGT";
+    const std::size_t unit = text.empty() ? std::string::npos : kUnits.find(text.back());
+    const bool has_unit = unit != std::string_view::npos;
+    const auto number = AsNumber<double>(std::string_view(text).substr(0, text.size() - (has_unit ? 1 : 0)));
+    const double bytes = number.value_or(-1) * std::pow(1024, has_unit ? static_cast<double>(unit + 1) : 0);
+    if (!(bytes >= 0 && bytes <= static_cast<double>(kLargestNumber))) {
+        throw Failure(kUsage, "a size looks like 500M, 4G or 1.5T");
+    }
+    return static_cast<std::int64_t>(bytes);
+}
+
+std::int64_t ParseMoment(const std::string& text, std::int64_t now_s) {
+    if (text == "now") {
+        return now_s;
+    }
+    if (text.starts_with('-')) {
+        return now_s - ParseDuration(text.substr(1));
+    }
+    if (const auto seconds = AsNumber<std::int64_t>(text)) {
+        return *seconds;
+    }
+    const std::optional<std::int64_t> date = AsDate(text);
+    if (!date || *date < 0) {
+        throw Failure(kUsage, "a time looks like 2026-03-01 08:15, 2026-03-01T08:15:30Z, -2h or now");
+    }
+    return *date;
+}
+
+std::string FormatMoment(std::int64_t moment_s) {
+    const auto time = static_cast<std::time_t>(moment_s);
+    std::tm local{};
+    char text[64];
+    if (::localtime_r(&time, &local) == nullptr || std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &local) == 0) {
+        return std::to_string(moment_s);
+    }
+    return text;
+}
+
+std::string FormatDuration(std::int64_t duration_s) {
+    constexpr struct {
+        const char* name;
+        std::int64_t seconds;
+    } kUnits[] = {{"d", 86400}, {"h", 3600}, {"m", 60}, {"s", 1}};
+    std::string text;
+    int parts = 0;
+    for (const auto& unit : kUnits) {
+        const std::int64_t count = duration_s / unit.seconds;
+        duration_s %= unit.seconds;
+        if (parts > 0 || count > 0) {
+            ++parts;
+            text += count > 0 ? (text.empty() ? "" : " ") + std::to_string(count) + unit.name : "";
+        }
+        if (parts == 2) {
+            break;
+        }
+    }
+    return text.empty() ? "0s" : text;
+}
+
+std::string FormatSize(std::int64_t size_bytes) {
+    constexpr const char* kUnits[] = {"B", "KiB", "MiB", "GiB", "TiB"};
+    auto size = static_cast<double>(size_bytes);
+    std::size_t unit = 0;
+    for (; size >= 1024 && unit + 1 < std::size(kUnits); ++unit) {
+        size /= 1024;
+    }
+    char text[32];
+    std::snprintf(text, sizeof text, unit == 0 ? "%.0f %s" : "%.1f %s", size, kUnits[unit]);
+    return text;
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,26 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Times, durations and sizes as operators write and read them.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+namespace lookhaven::cli {
+
+// "now"; "-2h" before now; seconds since the epoch; "2026-03-01", "2026-03-01 08:15" or "2026-03-01T08:15:30" in the
+// host's time zone, in UTC with a "Z" behind. UTC seconds. These three throw Failure for another form.
+std::int64_t ParseMoment(const std::string& text, std::int64_t now_s);
+// "90", "90s", "15m", "2h", "30d": seconds.
+std::int64_t ParseDuration(const std::string& text);
+// "500000", "64K", "500M", "4G", "1.5T": bytes, in powers of 1024.
+std::int64_t ParseSize(const std::string& text);
+
+// "2026-03-01 08:15:30" in the host's time zone.
+std::string FormatMoment(std::int64_t moment_s);
+// "1d 2h", "5m 10s", "0s": the two largest units.
+std::string FormatDuration(std::int64_t duration_s);
+// "1.5 GiB"
+std::string FormatSize(std::int64_t size_bytes);
+
+}  // namespace lookhaven::cli
