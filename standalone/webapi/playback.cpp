@@ -51,7 +51,8 @@ base::ProgressFile Progress(const Call& call) {
 }
 
 Json::Value SetRate(const Call& call) {
-    const int rate = IntOr(call.parameters, "rate", 0);
+    const Json::Value asked = Find(call.parameters, "rate");
+    const int rate = asked.isInt() ? asked.asInt() : 0;
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
     }

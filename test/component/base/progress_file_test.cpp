@@ -22,6 +22,7 @@ class ProgressFileTest : public testing::Test {
     ProgressFileTest() {
         std::string folder = "/tmp/lookhaven-progress.XXXXXX";
         root_ = mkdtemp(folder.data());
+        folder_ = root_ / "progress";
     }
     ~ProgressFileTest() override { std::filesystem::remove_all(root_); }
 
@@ -38,7 +39,7 @@ class ProgressFileTest : public testing::Test {
     }
 
     std::filesystem::path root_;
-    std::filesystem::path folder_ = root_ / "progress";
+    std::filesystem::path folder_;
 };
 
 TEST_F(ProgressFileTest, IsSharedWithinASessionAlone) {

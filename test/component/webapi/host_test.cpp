@@ -182,6 +182,8 @@ TEST(Host, LimitsRequestsInAllAndPerSession) {
         add(admin);
     }
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 503);
+    // An answered request counts until its process is gone.
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 3; }));
     add(guest);
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", guest).status, 200);
     ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 4; }));

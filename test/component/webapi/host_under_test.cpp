@@ -118,10 +118,13 @@ base::FileDescriptor HostUnderTest::Connect() const {
 }
 
 base::FileDescriptor HostUnderTest::Open(const std::string& method, const std::string& cookie) const {
+    return OpenQuery("api=Test&version=1&method=" + method, cookie);
+}
+
+base::FileDescriptor HostUnderTest::OpenQuery(const std::string& query, const std::string& cookie) const {
     base::FileDescriptor connection = Connect();
-    const std::string bytes = ScgiBytes({{"REQUEST_METHOD", "GET"},
-                                         {"QUERY_STRING", "api=Test&version=1&method=" + method},
-                                         {"HTTP_COOKIE", "id=" + cookie}});
+    const std::string bytes =
+        ScgiBytes({{"REQUEST_METHOD", "GET"}, {"QUERY_STRING", query}, {"HTTP_COOKIE", "id=" + cookie}});
     send(connection.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
     return connection;
 }

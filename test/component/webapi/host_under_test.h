@@ -46,6 +46,8 @@ class HostUnderTest {
     base::FileDescriptor Connect() const;
     // Connects and sends a GET of Test's method under the session.
     base::FileDescriptor Open(const std::string& method, const std::string& cookie) const;
+    // The same for any query.
+    base::FileDescriptor OpenQuery(const std::string& query, const std::string& cookie) const;
     // Sends bytes, then reads to the end of the answer.
     Answer Exchange(const std::string& bytes) const;
     Answer Ask(const std::string& query, const std::string& cookie, Headers headers = {},

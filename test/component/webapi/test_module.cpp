@@ -18,6 +18,7 @@
 #include "platform/output/multipartresponse.h"
 #include "platform/webapi/apirequest.h"
 #include "platform/webapi/apiresponse.h"
+#include "test/component/webapi/test_player.h"
 
 namespace {
 
@@ -96,6 +97,10 @@ void DieWithPlayerFile(const std::string& session) {
     raise(SIGKILL);
 }
 
+void Play(APIRequest* request, APIResponse*) {
+    PlayTest(*request);
+}
+
 void Serve(APIRequest* request, APIResponse* response) {
     const std::string method = request->GetAPIMethod();
     if (method == "Success") {
@@ -172,6 +177,8 @@ const Row kTable[] = {{"Test", 1, "Nothing", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Serve},
+                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEvent", Play},
+                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEventNoFrameId", Play},
                       {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace
