@@ -13,11 +13,10 @@
 #include "standalone/base/file.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/event_text.h"
 #include "standalone/cli/units.h"
 #include "standalone/media/remux.h"
-#include "standalone/store/events.h"
 #include "standalone/store/groups.h"
-#include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 
 namespace lookhaven::cli {
@@ -34,7 +33,6 @@ using store::MarkState;
 const std::map<std::string, int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
 const std::map<std::string, MarkKind> kMarkKinds = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
 const std::map<std::string, int> kReasons = {{"continuous", store::kReasonContinuous}, {"alarm", store::kReasonAlarm}};
-constexpr const char* kStates[] = {"pending", "saved", "missed"};
 
 struct Request {
     int id = 0;
@@ -58,48 +56,6 @@ struct Request {
 
 std::int64_t NowSeconds() {
     return base::WallMillis() / 1000;
-}
-
-std::string NameOf(MarkKind kind) {
-    return kind == MarkKind::kAlert ? "alert" : "pos";
-}
-
-Json::Value ToData(const Event& event) {
-    Json::Value data;
-    data["kind"] = "recorded";
-    data["id"] = event.id;
-    data["camera_id"] = event.camera_id;
-    data["mount_id"] = event.mount_id;
-    data["start"] = Json::Int64(event.start_s);
-    data["end"] = Json::Int64(event.end_s);
-    data["recording"] = event.recording;
-    data["reason"] = event.reason;
-    data["frame_count"] = event.frame_count;
-    data["size_bytes"] = Json::Int64(event.size_bytes);
-    data["video_type"] = static_cast<int>(event.video_type);
-    data["audio_codec"] = event.audio_codec;
-    data["width"] = event.width;
-    data["height"] = event.height;
-    data["path"] = event.path;
-    data["archived"] = event.archived;
-    data["demo"] = event.demo;
-    return data;
-}
-
-Json::Value ToData(const Mark& mark) {
-    Json::Value data;
-    data["kind"] = NameOf(mark.kind);
-    data["id"] = mark.id;
-    data["camera_id"] = mark.camera_id;
-    data["moment"] = Json::Int64(mark.moment_s);
-    data["start"] = Json::Int64(mark.start_s);
-    data["end"] = Json::Int64(mark.end_s);
-    data["text"] = mark.text;
-    data["state"] = kStates[static_cast<std::size_t>(mark.state)];
-    data["mount_id"] = mark.mount_id;
-    data["path"] = mark.path;
-    data["demo"] = mark.demo;
-    return data;
 }
 
 std::set<int> ChosenCameras(store::Store& store, const Request& request) {
@@ -159,7 +115,7 @@ void ListMarks(const Console& console, store::Store& store, const Request& reque
     for (const Mark& mark : Marks(store).List(filter)) {
         data.append(ToData(mark));
         rows.push_back({std::to_string(mark.id), std::to_string(mark.camera_id), FormatMoment(mark.moment_s),
-                        kStates[static_cast<std::size_t>(mark.state)], mark.text.substr(0, mark.text.find('\n'))});
+                        NameOf(mark.state), mark.text.substr(0, mark.text.find('\n'))});
     }
     console.Answer(rows.size() == 1 ? "There is no such event." : Table(rows), data);
 }
@@ -194,27 +150,6 @@ std::filesystem::path FileOf(store::Store& store, const Found& found) {
         found.event ? !found.event->demo : found.mark->state == MarkState::kSaved && !found.mark->demo;
     const auto mount = store::Mounts(store).Find(mount_id);
     return has_file && mount ? std::filesystem::path(mount->path) / path : std::filesystem::path();
-}
-
-std::string Description(const Event& event) {
-    const std::string reason = event.reason == store::kReasonAlarm        ? "an alarm"
-                               : event.reason == store::kReasonContinuous ? "continuous recording"
-                                                                          : "reason " + std::to_string(event.reason);
-    return "Event " + std::to_string(event.id) + " of camera " + std::to_string(event.camera_id) + ", " + reason +
-           (event.recording ? ", still recording" : "") + (event.archived ? ", archived" : "") +
-           (event.demo ? ", made up for a trial" : "") + "\nfrom   " + FormatMoment(event.start_s) + "\nto     " +
-           FormatMoment(event.end_s) + "\nvideo  " + VideoTypeName(event.video_type) + " " +
-           std::to_string(event.width) + "x" + std::to_string(event.height) + ", " + std::to_string(event.frame_count) +
-           " frames\naudio  " + (event.audio_codec.empty() ? "none" : event.audio_codec) + "\nsize   " +
-           FormatSize(event.size_bytes) + "\n";
-}
-
-std::string Description(const Mark& mark) {
-    return (mark.kind == MarkKind::kAlert ? "Alert " : "Sale ") + std::to_string(mark.id) + " of camera " +
-           std::to_string(mark.camera_id) + ", " + kStates[static_cast<std::size_t>(mark.state)] +
-           (mark.demo ? ", made up for a trial" : "") + "\nat     " + FormatMoment(mark.moment_s) + "\nfrom   " +
-           FormatMoment(mark.start_s) + "\nto     " + FormatMoment(mark.end_s) + "\n" +
-           (mark.text.empty() ? "" : mark.text + "\n");
 }
 
 void Show(const Console& console, const Request& request) {

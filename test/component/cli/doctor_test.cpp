@@ -16,6 +16,7 @@
 #include "standalone/ring/inventory.h"
 #include "standalone/ring/writer.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/events.h"
 #include "test/component/cli/program.h"
 
 namespace lookhaven::cli {
@@ -76,6 +77,15 @@ class DoctorTest : public CliTest {
         store::Connection(store::StoreAddress::Parse(url)).Write([&](soci::session& sql) { sql << statement; });
     }
 
+    void AddRecording(std::int64_t size_bytes) {
+        store::Event event;
+        event.camera_id = 1;
+        event.mount_id = 2;
+        event.size_bytes = size_bytes;
+        store::Store store = Open();
+        store::Events(store).AddAll(std::vector{event});
+    }
+
     std::unique_ptr<FakeHost> host_;
 };
 
@@ -105,6 +115,15 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
          "init --admin", [&] { Sql("update users set privilege = 0 where name = 'admin'"); }},
         {"no live source", [&] { Sql("update cameras set live_profile = 2 where id = 1"); }, "camera 1 has no source",
          "camera set", [&] { Sql("update cameras set live_profile = 0 where id = 1"); }},
+        {"no mount", [&] { Sql("delete from mounts"); }, "no mount to record to", "lookhaven init",
+         [&] { EXPECT_EQ(Run("init").code, 0); }},
+        {"mount gone", [&] { std::filesystem::rename(home_ / "recordings", home_ / "away"); }, "is not there",
+         "mount its disk", [&] { std::filesystem::rename(home_ / "away", home_ / "recordings"); }},
+        {"another folder", [&] { std::filesystem::remove(home_ / "recordings" / ".lookhaven-mount"); },
+         "not the folder that was added", "mount set",
+         [&] { EXPECT_EQ(Run("mount set 2 --path " + (home_ / "recordings").string()).code, 0); }},
+        {"above the limit", [&] { Sql("update mounts set max_bytes = 10"), AddRecording(12); }, "above its limit",
+         "raise the limit", [&] { Sql("delete from events"); }},
         {"mute host", [&] { host_.reset(), host_ = std::make_unique<FakeHost>(socket, false); }, "does not answer",
          "start the server", [&] { host_.reset(); }},
         {"no host", [&] { std::filesystem::remove(socket); }, "does not answer", "start the server",

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "test/component/cli/program.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdlib>
 
@@ -11,6 +12,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/installation.h"
 
 namespace lookhaven::cli {
 
@@ -122,6 +124,25 @@ Outcome CliTest::RunOnTerminal(const std::string& line, const std::vector<std::s
     }
     text += ReadUntil(terminal, "");
     return {ExitCode(child), std::move(text)};
+}
+
+void CliTest::Play(const std::vector<Row>& rows) {
+    for (const Row& row : rows) {
+        const Outcome outcome = Run(row.line, row.input);
+        EXPECT_EQ(outcome.code, row.code) << row.line << "\n" << outcome.text;
+        EXPECT_THAT(outcome.text, testing::HasSubstr(row.has)) << row.line;
+        if (!row.has_not.empty()) {
+            EXPECT_THAT(outcome.text, testing::Not(testing::HasSubstr(row.has_not))) << row.line;
+        }
+        if (outcome.code >= 64 && row.line.find("--json") == std::string::npos) {
+            EXPECT_EQ(std::count(outcome.text.begin(), outcome.text.end(), '\n'), 1) << row.line << outcome.text;
+        }
+        EXPECT_THAT(outcome.text, testing::Not(testing::HasSubstr("s3cret"))) << row.line;
+    }
+}
+
+store::Store CliTest::Open() {
+    return store::Store::Open(base::Installation(home_).StoreUrl());
 }
 
 void CliTest::SetUpDemo() {

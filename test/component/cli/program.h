@@ -10,11 +10,22 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/store/store.h"
+
 namespace lookhaven::cli {
 
 struct Outcome {
     int code = -1;
     std::string text;  // standard output and standard error
+};
+
+// One line of a session and what must come of it; an empty text is not looked for.
+struct Row {
+    std::string line;
+    std::string input;
+    int code;
+    std::string has;
+    std::string has_not;
 };
 
 class CliTest : public testing::Test {
@@ -26,9 +37,13 @@ class CliTest : public testing::Test {
     Outcome Run(const std::string& line, const std::string& input = "", bool as_nobody = false);
     // The same on a terminal, where the answers are typed as each prompt shows.
     Outcome RunOnTerminal(const std::string& line, const std::vector<std::string>& answers);
+    // Runs line after line. What fails answers in one sentence, and no password ever shows.
+    void Play(const std::vector<Row>& rows);
 
     // An installation with an owner "admin" and a viewer, their passwords as below, and the demo's cameras.
     void SetUpDemo();
+
+    store::Store Open();
 
     static constexpr const char* kAdminPassword = "admin-s3cret";
     static constexpr const char* kViewerPassword = "viewer-s3cret";

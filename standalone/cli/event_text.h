@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// How events and marks are shown.
+#pragma once
+
+#include <string>
+
+#include <json/json.h>
+
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+
+namespace lookhaven::cli {
+
+const char* NameOf(store::MarkState state);
+
+// All that the record says.
+Json::Value ToData(const store::Event& event);
+Json::Value ToData(const store::Mark& mark);
+
+// The same in lines for a reader.
+std::string Description(const store::Event& event);
+std::string Description(const store::Mark& mark);
+
+}  // namespace lookhaven::cli
