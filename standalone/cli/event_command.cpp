@@ -16,6 +16,7 @@
 #include "standalone/cli/event_text.h"
 #include "standalone/cli/units.h"
 #include "standalone/media/remux.h"
+#include "standalone/media/source.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
 
@@ -194,6 +195,29 @@ std::filesystem::path RequireFile(store::Store& store, const Request& request) {
     return file;
 }
 
+void CopyTo(int output, const std::filesystem::path& recording, const media::ExportOptions& options) {
+    try {
+        media::Export(recording, output, options);
+    } catch (const media::SourceError& error) {
+        throw Failure(kDataError, error.what());
+    }
+}
+
+// The file is not there unless it is whole.
+void CopyToFile(const std::string& file, const std::filesystem::path& recording, const media::ExportOptions& options) {
+    if (::access(file.c_str(), F_OK) == 0) {
+        throw Failure(kCannotCreate, "there is already a file " + file + ": name another one");
+    }
+    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
+    try {
+        CopyTo(output.Get(), recording, options);
+    } catch (...) {
+        std::error_code ignored;
+        std::filesystem::remove(file, ignored);
+        throw;
+    }
+}
+
 void Export(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::int64_t now = NowSeconds();
@@ -207,20 +231,10 @@ void Export(const Console& console, const Request& request) {
     }
     const std::filesystem::path recording = RequireFile(store, request);
     if (request.file == "-") {
-        media::Export(recording, STDOUT_FILENO, options);
+        CopyTo(STDOUT_FILENO, recording, options);
         return;
     }
-    if (::access(request.file.c_str(), F_OK) == 0) {
-        throw Failure(kCannotCreate, "there is already a file " + request.file + ": name another one");
-    }
-    try {
-        const base::FileDescriptor output = base::OpenFile(request.file, O_RDWR | O_CREAT | O_EXCL, 0600);
-        media::Export(recording, output.Get(), options);
-    } catch (...) {
-        std::error_code ignored;
-        std::filesystem::remove(request.file, ignored);
-        throw;
-    }
+    CopyToFile(request.file, recording, options);
     Json::Value data;
     data["id"] = request.id;
     data["file"] = request.file;

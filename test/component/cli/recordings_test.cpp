@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The command line's view of recordings: events, marks, mounts, groups, plans, made-up events, export and verify.
+#include <chrono>
 #include <cstdio>
 #include <fstream>
 #include <memory>
@@ -245,6 +246,10 @@ void Record(const std::filesystem::path& file) {
         }
     }
     writer->Close();
+    for (const std::filesystem::path& made : {file, archive::IndexPathOf(file)}) {
+        // What has only just been written may still get its row.
+        std::filesystem::last_write_time(made, std::filesystem::file_time_type::clock::now() - std::chrono::hours(24));
+    }
 }
 
 // What ffprobe counts: "video,25" and so on, a line a stream.
