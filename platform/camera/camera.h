@@ -35,6 +35,8 @@ class LH_PLATFORM_API Camera {
     // Loads the record of the camera, whether or not the caller may see it. serverId 0 is this host; archiveId 0 is the
     // live record. Returns 0, or non-zero when there is no such camera; then the record is unchanged.
     int Load(int camId, int serverId, int archiveId);
+    // Likewise for a camera that a recording server owns, by its id there.
+    int LoadByIdOnRecServer(int idOnServer, int serverId);
 
     // The profile that the camera's live view is configured to show.
     CAM_PROFILE_TYPE GetLiveProfile() const;
@@ -52,6 +54,9 @@ class LH_PLATFORM_API Camera {
     bool m_blPtz;    // the camera moves
     bool m_blAudio;  // the camera hears
     std::string m_StoragePath;
+    int m_AudioType = 0;         // how the camera codes its sound, as the recorder numbers it; 0: none, or unknown
+    int m_DeviceType = 0;        // the recorder's number for the kind of device
+    std::string m_OwnerDevName;  // the recording server that owns the camera; empty for this host's own
 };
 
 // The cameras of this host in list order. deniedIds: ids to leave out, decimal, ascending, joined by ",". groupIds:

@@ -17,6 +17,16 @@ enum CAM_PRIV_TYPE : int {
     CAM_PRIV_AUDIO = 8,
 };
 
+// The kind of access to an e-map that is asked about.
+enum ITEM_PRIV_TYPE : int {
+    ITEM_PRIV_VIEW = 2,
+};
+
+// The kind of access to a door that is asked about.
+enum DOOR_PRIV_TYPE : int {
+    DOOR_PRIV_VIEW = 1,
+};
+
 // The user id that stands for a peer admitted by pair matching. No account has it.
 constexpr unsigned int PAIR_AUTH_UID = 1024;
 
@@ -39,6 +49,9 @@ class LH_PLATFORM_API PrivProfile {
     std::set<int> GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const;
     // The ids of camera groups to which the user lacks the kind of access (a CAM_PRIV_TYPE).
     std::set<int> GetInaPrivPerCamGrpIdSet(int type) const;
+    // The ids of e-maps and of I/O modules that the user may not see. withHidden as above.
+    std::set<int> GetInaEmapIdSet(ITEM_PRIV_TYPE type, bool withHidden) const;
+    std::set<int> GetInaIOIdSet(bool withHidden) const;
     // Narrows the profile by the rights that a relaying host sends along; null changes nothing. Never widens it.
     void UpdateByJson(const Json::Value& privData);
 
@@ -49,3 +62,6 @@ class LH_PLATFORM_API PrivProfile {
 // The profile of the user, read afresh. PAIR_AUTH_UID gives a peer's profile, which denies nothing. For an unknown user
 // the result's GetId() is 0.
 LH_PLATFORM_API PrivProfile PrivProfileGetByUid(unsigned int uid);
+
+// True when the profile gives the kind of access to the door.
+LH_PLATFORM_API bool IsDoorPrivAllowed(const PrivProfile& profile, DOOR_PRIV_TYPE type, int doorId);

@@ -228,6 +228,15 @@ std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) c
 std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
     return Call("GetInaPrivPerCamGrpIdSet", type), m_pData->denied_groups;
 }
+std::set<int> PrivProfile::GetInaEmapIdSet(ITEM_PRIV_TYPE type, bool withHidden) const {
+    return Call("GetInaEmapIdSet", type, withHidden), Script().denied_emaps;
+}
+std::set<int> PrivProfile::GetInaIOIdSet(bool withHidden) const {
+    return Call("GetInaIOIdSet", withHidden), Script().denied_modules;
+}
+bool IsDoorPrivAllowed(const PrivProfile&, DOOR_PRIV_TYPE type, int doorId) {
+    return Call("IsDoorPrivAllowed", type, doorId), Script().denied_doors.count(doorId) == 0;
+}
 void PrivProfile::UpdateByJson(const Json::Value& privData) {
     Call("UpdateByJson", Text(privData));
 }

@@ -18,6 +18,7 @@
 #include <pthread.h>
 
 #include "platform/camera/camera.h"
+#include "platform/emap/emap.h"
 #include "platform/live/commoncfg.h"
 #include "platform/live/livestream.h"
 #include "platform/log/dbglogcfg.h"
@@ -107,6 +108,11 @@ class ScriptedPlatform {
     std::list<Event> found_events;
     std::map<int, Camera> group_cameras, mount_cameras;
     int group_result = 0, rec_log_result = 0;
+
+    bool has_emap = true;
+    std::string image_name = "floor.old.png";
+    std::vector<std::optional<__tag_EMAP_ITEM_INFO>> emap_items;  // none: cannot be got
+    std::set<int> unknown_devices, denied_emaps, denied_doors, denied_modules;
 
     LHShmCommonCfg common_cfg;
     bool has_common_cfg = true;
