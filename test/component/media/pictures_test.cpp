@@ -1,0 +1,136 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Pictures of a recording by number: any order gives what the order of showing gives, and what ffmpeg decodes.
+#include <algorithm>
+#include <fstream>
+#include <numeric>
+#include <random>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "standalone/media/picture_reader.h"
+#include "standalone/media/source.h"
+#include "test/component/archive/archive_folder.h"
+#include "test/component/media/clips.h"
+
+namespace lookhaven::test {
+
+namespace {
+
+using namespace media;
+
+using Picture = std::vector<std::uint8_t>;
+
+Picture Read(PictureReader& reader, int index) {
+    Picture picture(2 << 20);
+    picture.resize(reader.Read(index, picture));
+    return picture;
+}
+
+std::vector<Picture> ReadAll(const archive::Recording& recording) {
+    PictureReader reader(recording);
+    std::vector<Picture> pictures;
+    for (int i = 0; i < recording.FrameCount(); ++i) {
+        pictures.push_back(Read(reader, i));
+    }
+    return pictures;
+}
+
+TEST(PictureReader, AnyOrderGivesThePicturesThatFfmpegDecodes) {
+    for (const char* options : {kMjpeg, kH264, kH264Reordered, kH265}) {
+        SCOPED_TRACE(options);
+        const ArchiveFolder folder;
+        Record(MakeClip(options), folder / "a.mkv");
+        const archive::Recording recording(folder / "a.mkv");
+        const std::vector<Picture> pictures = ReadAll(recording);
+        ASSERT_EQ(pictures.size(), 100U);
+        if (options == kMjpeg) {
+            EXPECT_EQ(pictures, MakeClip(options).Frames());
+        }
+        std::ofstream all(folder / "all.mjpeg", std::ios::binary);
+        for (const Picture& picture : pictures) {
+            all.write(reinterpret_cast<const char*>(picture.data()), static_cast<std::streamsize>(picture.size()));
+        }
+        all.close();
+        // The likeness of the least alike frame, in decibels: a frame more or less, or wrong colours, is far below 30.
+        const std::string likeness =
+            Shell("cd " + folder.Path().string() +
+                  " && ffmpeg -v info -r 25 -i all.mjpeg -r 25 -i a.mkv -lavfi "
+                  "'[0:v]format=rgb24[a];[1:v]format=rgb24[b];[a][b]psnr' -f null - 2>&1 | grep -o 'min:[0-9.inf]*'");
+        ASSERT_THAT(likeness, testing::StartsWith("min:"));
+        EXPECT_GT(std::stod(likeness.substr(4)), 30) << likeness;
+
+        std::mt19937 random(5);
+        PictureReader reader(recording);
+        for (int i = 0; i < 150; ++i) {
+            const int index = static_cast<int>(i < 30 ? 99 - static_cast<unsigned>(i) : random() % 100);
+            ASSERT_EQ(Read(reader, index), pictures[static_cast<std::size_t>(index)]) << index << ", read " << i;
+        }
+    }
+}
+
+TEST(PictureReader, FollowsARecordingThatGrowsAndGoesOnWhenItIsDeleted) {
+    const ArchiveFolder folder;
+    const Clip& clip = MakeClip(kH264);
+    Record(clip, folder / "whole.mkv");
+    const std::vector<Picture> pictures = ReadAll(archive::Recording(folder / "whole.mkv"));
+    RecordingWriter writer(folder / "a.mkv", clip.format, 4'000'000'000'000, 1);
+    archive::Recording recording(folder / "a.mkv");
+    PictureReader reader(recording);
+    for (int i = 0; i < 100; ++i) {
+        writer.Write(clip.At(static_cast<std::size_t>(i)));
+        writer.Flush();
+        recording.Refresh();
+        ASSERT_EQ(recording.FrameCount(), i + 1);
+        ASSERT_EQ(Read(reader, i), pictures[static_cast<std::size_t>(i)]) << i;
+        if (i == 50) {
+            std::filesystem::remove(folder / "a.mkv");
+            std::filesystem::remove(folder / "a.index");
+        }
+    }
+}
+
+TEST(PictureReader, RefusesWhatDoesNotFitAndWhatIsGone) {
+    for (const char* options : {kMjpeg, kH264}) {
+        const ArchiveFolder folder;
+        Record(MakeClip(options), folder / "a.mkv");
+        const archive::Recording recording(folder / "a.mkv");
+        PictureReader reader(recording);
+        std::vector<std::uint8_t> small(500);
+        EXPECT_THROW(reader.Read(3, small), SourceError);
+        const Picture fourth = Read(reader, 3);
+        EXPECT_FALSE(fourth.empty());
+        std::filesystem::resize_file(folder / "a.mkv", 2000);
+        EXPECT_THROW(Read(reader, 90), archive::ArchiveError);
+    }
+}
+
+// Noise where frames were: pictures may look odd, but the reader lives and finds its way again at a key frame.
+TEST(PictureReader, SurvivesDamagedFrames) {
+    const ArchiveFolder folder;
+    Record(MakeClip(kH264), folder / "a.mkv");
+    const archive::Recording recording(folder / "a.mkv");
+    const std::vector<Picture> pictures = ReadAll(recording);
+    std::string bytes = Contents(folder / "a.mkv");
+    std::mt19937 random(11);
+    for (std::uint32_t i = 25; i < 75; ++i) {
+        const archive::FrameEntry& entry = recording.Entries(0)[i];
+        std::generate_n(bytes.begin() + static_cast<std::ptrdiff_t>(entry.offset), entry.size,
+                        [&] { return static_cast<char>(random()); });
+    }
+    std::fstream(folder / "a.mkv", std::ios::in | std::ios::out | std::ios::binary) << bytes;
+    PictureReader reader(recording);
+    for (int i = 0; i < 100; ++i) {
+        try {
+            const Picture picture = Read(reader, i);
+            EXPECT_TRUE((i >= 25 && i < 75) || picture == pictures[static_cast<std::size_t>(i)]) << i;
+        } catch (const SourceError&) {
+            EXPECT_TRUE(i >= 25 && i < 75) << i;
+        }
+    }
+}
+
+}  // namespace
+
+}  // namespace lookhaven::test

@@ -1,0 +1,242 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Recordings of every format, as ffprobe sees them; killed at any point, on a full disk, cut, without an index.
+#include <csignal>
+#include <random>
+#include <thread>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/mman.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+
+#include "standalone/archive/recording.h"
+#include "standalone/archive/repair.h"
+#include "standalone/base/clock.h"
+#include "test/component/archive/archive_folder.h"
+#include "test/component/media/clips.h"
+
+namespace lookhaven::test {
+
+namespace {
+
+using namespace media;
+
+std::vector<archive::FrameEntry> Entries(const std::filesystem::path& recording) {
+    const archive::Recording opened(recording);
+    const auto entries = opened.Entries(0);
+    return {entries.begin(), entries.end()};
+}
+
+TEST(RecordingWriter, OtherProgramsReadEveryFormatAndALostIndexComesBack) {
+    struct Row {
+        const char* video;
+        const char* audio;
+        const char* probed;  // a pattern for ffprobe's lines
+    };
+    const Row rows[] = {
+        {kMjpeg, "", "mjpeg,100\n"},
+        {kMjpeg, "-c:a pcm_mulaw", "mjpeg,100\npcm_mulaw,[0-9]+\n"},
+        {kH264, "-c:a aac -ar 16000", "h264,100\naac,6[0-9]\n"},
+        {kH264Reordered, "-c:a pcm_alaw", "h264,100\npcm_alaw,[0-9]+\n"},
+        {kH265, "-c:a libopus -ar 48000", "hevc,100\nopus,20[0-9]\n"},
+    };
+    for (const Row& row : rows) {
+        SCOPED_TRACE(std::string(row.video) + row.audio);
+        const ArchiveFolder folder;
+        const std::filesystem::path path = folder / "a.mkv";
+        Record(MakeClip(row.video, row.audio), path);
+        EXPECT_THAT(Probe(path), testing::MatchesRegex(row.probed));
+        EXPECT_EQ(Shell("ffprobe -v error -show_entries format_tags=creation_time -of csv=p=0 " + path.string()),
+                  "2026-03-01T08:15:30.000000Z\n");
+        const archive::Recording recording(path);
+        EXPECT_NEAR(recording.FrameRate(), 25, 0.1);
+        EXPECT_FALSE(recording.Grows());
+        const std::vector<archive::FrameEntry> written = Entries(path);
+        std::filesystem::remove(archive::IndexPathOf(path));
+        EXPECT_THROW(archive::Recording{path}, std::system_error);
+        const archive::Contents contents = archive::CloseCrashed(path);
+        EXPECT_EQ(contents.frame_count, 100);
+        EXPECT_EQ(contents.duration_ms, 4000);
+        EXPECT_EQ(contents.header, recording.Header(0));
+        EXPECT_EQ(Entries(path), written);
+    }
+}
+
+// What a child process has handed to its writer, seen by the test: the capture time of each frame.
+struct Handed {
+    std::atomic<int> count{0};
+    std::int64_t times_us[5000] = {};
+};
+
+[[noreturn]] void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int length, Handed& handed) {
+    RecordingWriter writer(path, clip.format, base::WallMillis(), 1);
+    for (int i = 0; i < length; ++i) {
+        Packet packet = clip.At(static_cast<std::size_t>(i) % clip.packets.size());
+        packet.timestamp_us = base::MonotonicMicros();
+        if (packet.medium == Medium::kVideo) {
+            handed.times_us[handed.count] = packet.timestamp_us;
+            handed.count++;
+        }
+        writer.Write(packet);
+        std::this_thread::sleep_for(std::chrono::milliseconds(4));
+    }
+    writer.Close();
+    ::pause();
+    ::_exit(0);
+}
+
+TEST(RecordingWriter, LosesLessThanASecondWhenKilledAnywhere) {
+    constexpr int kBatches = 10;
+    constexpr int kAtOnce = 10;
+    const Clip* clips[] = {&MakeClip(kMjpeg), &MakeClip(kH264, "-c:a aac -ar 16000")};
+    std::mt19937 random(std::random_device{}());
+    for (int batch = 0; batch < kBatches; ++batch) {
+        const ArchiveFolder folder;
+        auto* handed =
+            new (::mmap(nullptr, kAtOnce * sizeof(Handed), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0))
+                Handed[kAtOnce];
+        std::vector<std::pair<std::int64_t, std::pair<pid_t, int>>> kills;
+        for (int i = 0; i < kAtOnce; ++i) {
+            const int length = 30 + static_cast<int>(random() % 400);
+            const pid_t pid = ::fork();
+            ASSERT_GE(pid, 0);
+            if (pid == 0) {
+                RecordUntilKilled(*clips[i % 2], folder / (std::to_string(i) + ".mkv"), length, handed[i]);
+            }
+            kills.push_back(
+                {base::MonotonicMicros() + 20'000 + static_cast<std::int64_t>(random() % 2'000'000), {pid, i}});
+        }
+        std::sort(kills.begin(), kills.end());
+        for (const auto& [time_us, child] : kills) {
+            std::this_thread::sleep_for(
+                std::chrono::microseconds(std::max<std::int64_t>(0, time_us - base::MonotonicMicros())));
+            ::kill(child.first, SIGKILL);
+            const std::int64_t killed_us = base::MonotonicMicros();
+            int status = 0;
+            ASSERT_EQ(::waitpid(child.first, &status, 0), child.first);
+            ASSERT_TRUE(WIFSIGNALED(status)) << "the child failed by itself";
+            const Handed& seen = handed[child.second];
+            const auto old = std::count_if(seen.times_us, seen.times_us + seen.count,
+                                           [&](std::int64_t us) { return us < killed_us - 1'000'000; });
+            const std::filesystem::path path = folder / (std::to_string(child.second) + ".mkv");
+            const int frames = std::filesystem::exists(path) ? archive::CloseCrashed(path).frame_count : 0;
+            ASSERT_GE(frames, old) << "of " << seen.count << " frames";
+            if (frames > 0) {
+                ASSERT_EQ(archive::Recording(path).FrameCount(), frames);
+                const char* codec = child.second % 2 == 0 ? "mjpeg," : "h264,";
+                ASSERT_THAT(Probe(path), testing::AllOf(testing::StartsWith(codec + std::to_string(frames) + "\n"),
+                                                        testing::Not(testing::HasSubstr("rror"))));
+            }
+        }
+        ::munmap(handed, kAtOnce * sizeof(Handed));
+    }
+}
+
+TEST(RecordingWriter, IsReadWhileItIsWritten) {
+    const ArchiveFolder folder;
+    const Clip& clip = MakeClip(kMjpeg);
+    const auto frames = clip.Frames();
+    RecordingWriter writer(folder / "a.mkv", clip.format, 4'000'000'000'000, 1);
+    archive::Recording recording(folder / "a.mkv");
+    for (std::size_t i = 0; i < frames.size(); ++i) {
+        writer.Write(clip.At(i));
+        writer.Flush();
+        recording.Refresh();
+        ASSERT_TRUE(recording.Grows());
+        ASSERT_EQ(recording.FrameCount(), static_cast<int>(i + 1));
+        const archive::FrameEntry& entry = recording.Entries(0)[i];
+        std::vector<std::uint8_t> bytes(entry.size);
+        recording.ReadBytes(0, entry, bytes);
+        ASSERT_EQ(bytes, frames[i]) << "a picture changed on its way";
+    }
+    EXPECT_THROW(archive::CloseCrashed(folder / "a.mkv"), std::system_error) << "a living writer's file";
+    writer.Close();
+    EXPECT_EQ(writer.FrameCount(), 100);
+    EXPECT_EQ(writer.EndWallMs(), 4'000'000'004'000);
+    EXPECT_EQ(writer.SizeBytes(),
+              std::filesystem::file_size(folder / "a.mkv") + std::filesystem::file_size(folder / "a.index"));
+}
+
+TEST(RecordingWriter, AFullDiskLeavesWhatWasFlushed) {
+    const ArchiveFolder folder;
+    const Clip& clip = MakeClip(kMjpeg);
+    struct rlimit before {};
+    ::getrlimit(RLIMIT_FSIZE, &before);
+    // A limit on the size of files, which refuses at any byte, stands for a disk that is full.
+    const auto old_handler = std::signal(SIGXFSZ, SIG_IGN);
+    for (const rlim_t limit : {30'001, 100'000, 123'457, 200'003}) {
+        const std::filesystem::path path = folder / (std::to_string(limit) + ".mkv");
+        RecordingWriter writer(path, clip.format, 0, 1);
+        const struct rlimit small { limit, before.rlim_max };
+        ::setrlimit(RLIMIT_FSIZE, &small);
+        try {
+            for (std::size_t i = 0; i < clip.packets.size(); ++i) {
+                writer.Write(clip.At(i));
+                writer.Flush();
+            }
+            ADD_FAILURE() << "nobody noticed";
+        } catch (const WriteError& error) {
+            EXPECT_EQ(error.code(), std::errc::file_too_large);
+        }
+        writer.Close();
+        ::setrlimit(RLIMIT_FSIZE, &before);
+        EXPECT_GT(writer.FrameCount(), 0);
+        EXPECT_EQ(archive::Recording(path).FrameCount(), writer.FrameCount());
+        EXPECT_FALSE(archive::Recording(path).Grows());
+        EXPECT_EQ(Probe(path), "mjpeg," + std::to_string(writer.FrameCount()) + "\n");
+    }
+    std::signal(SIGXFSZ, old_handler);
+    EXPECT_THROW(RecordingWriter(folder / "gone" / "a.mkv", clip.format, 0, 1), WriteError);
+    EXPECT_FALSE(std::filesystem::exists(folder / "gone"));
+}
+
+TEST(CloseCrashed, SavesWhatIsWholeOfACutOrDamagedRecording) {
+    const ArchiveFolder folder;
+    const std::filesystem::path path = folder / "a.mkv";
+    Record(MakeClip(kH264, "-c:a aac -ar 16000"), path, false);
+    const std::string bytes = Contents(path);
+    const std::string index = Contents(archive::IndexPathOf(path));
+    const std::vector<archive::FrameEntry> frames = Entries(path);
+    ASSERT_EQ(frames.size(), 100U);
+    std::mt19937 random(3);
+    for (int round = 0; round < 400; ++round) {
+        std::string damaged = bytes;
+        std::string damaged_index = index;
+        const std::size_t place = round < 200 ? static_cast<std::size_t>(round) : random() % bytes.size();
+        if (round % 2 == 0) {
+            damaged.resize(place);
+        } else {
+            damaged[place] = static_cast<char>(damaged[place] ^ 1 << random() % 8);
+        }
+        damaged_index[random() % index.size()] ^= 64;
+        Write(path, damaged);
+        Write(archive::IndexPathOf(path), round % 3 == 0 ? damaged_index : index);
+        if (round % 3 == 1) {
+            std::filesystem::remove(archive::IndexPathOf(path));
+        }
+        const int saved = archive::CloseCrashed(path).frame_count;
+        if (saved > 0) {
+            const auto left = Entries(path);
+            ASSERT_EQ(left.size(), static_cast<std::size_t>(saved));
+            ASSERT_LE(left.size(), frames.size());
+            ASSERT_LE(left.back().offset + left.back().size, std::filesystem::file_size(path));
+        }
+        if (round % 2 == 0) {
+            ASSERT_EQ(saved, [&] {
+                const auto whole = archive::CloseCrashed(path).frame_count;
+                return whole;
+            }()) << "done twice it gives something else";
+            const auto in_file = std::count_if(frames.begin(), frames.end(),
+                                               [&](const auto& frame) { return frame.offset + frame.size <= place; });
+            ASSERT_LE(saved, in_file);
+            ASSERT_GE(saved, in_file - 20) << "more than the last cluster is gone";
+        }
+    }
+    EXPECT_THROW(archive::CloseCrashed(folder / "none.mkv"), std::system_error);
+}
+
+}  // namespace
+
+}  // namespace lookhaven::test
