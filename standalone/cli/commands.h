@@ -31,6 +31,7 @@ void AddDemo(CLI::App& program, Console& console);
 void AddEvent(CLI::App& program, Console& console);
 void AddMount(CLI::App& program, Console& console);
 void AddGroup(CLI::App& program, Console& console);
+void AddSetting(CLI::App& program, Console& console);
 void AddVerify(CLI::App& program, Console& console);
 void AddDoctor(CLI::App& program, Console& console);
 

@@ -8,6 +8,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/demo_events.h"
+#include "standalone/cli/demo_footage.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
@@ -117,6 +118,17 @@ void Setup(const Console& console) {
                    data);
 }
 
+void MakeFootage(const Console& console) {
+    store::Store store = console.OpenStore();
+    const DemoFootage made = RecordDemoFootage(store, base::WallMillis() / 1000);
+    Json::Value data;
+    data["events_added"] = made.events;
+    data["marks_added"] = made.marks;
+    console.Answer("Recorded " + std::to_string(made.events) + " events of the last days with " +
+                       std::to_string(made.marks) + " alerts and sales.",
+                   data);
+}
+
 struct EventRequest {
     int count = 0;
     int days = 30;
@@ -148,6 +160,9 @@ void AddDemo(CLI::App& program, Console& console) {
                          "Adds four cameras, two of them recorded, and the account viewer, whose password is asked "
                          "for")
         ->callback([&console] { Setup(console); });
+
+    demo->add_subcommand("footage", "Records some scenes of the last days, with alerts and sales, to look at")
+        ->callback([&console] { MakeFootage(console); });
 
     CLI::App* events = demo->add_subcommand("events", "Makes up events for a trial, or removes them");
     auto request = std::make_shared<EventRequest>();

@@ -7,6 +7,7 @@
 
 #include "standalone/archive/layout.h"
 #include "standalone/cli/console.h"
+#include "standalone/media/packet.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
@@ -39,7 +40,7 @@ class Inventor {
         event.reason = Draw(0, 9) == 0 ? store::kReasonAlarm : store::kReasonContinuous;
         event.frame_count = static_cast<int>(length * 25);
         event.video_type = camera.video_type;
-        event.audio_codec = camera.audio ? "aac" : "";
+        event.audio_codec = camera.audio ? media::CodecName(media::Codec::kAac) : "";
         const store::CameraProfile* profile = camera.FindProfile(camera.live_profile);
         event.width = profile != nullptr && profile->width > 0 ? profile->width : 1280;
         event.height = profile != nullptr && profile->height > 0 ? profile->height : 720;

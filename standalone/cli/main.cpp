@@ -74,6 +74,7 @@ int Run(int argc, char** argv) {
     AddGroup(program, console);
     AddMount(program, console);
     AddEvent(program, console);
+    AddSetting(program, console);
     AddVerify(program, console);
     AddDemo(program, console);
     AddDoctor(program, console);

@@ -63,6 +63,11 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
     EXPECT_EQ(plans, "1+ 2+ ");
     EXPECT_THAT(store::Groups(store).Find(1).value().camera_ids, ElementsAre(1, 2));
 
+    Play({{"demo footage", "", 0, "8 events of the last days with 8 alerts", ""},
+          {"demo footage", "", 0, "0 events", ""},
+          {"verify", "", 0, "8 events with 4000 frames", ""},
+          {"event list --kind pos --camera 2", "", 0, "saved  2 x Coffee", "pending"}});
+
     // A second set-up takes nothing back, and lowers no limit under which there may be recordings.
     Play({{"mount set 1 --limit 900G", "", 0, "changed", ""},
           {"camera set 1 --record never", "", 0, "changed", ""},
