@@ -264,6 +264,7 @@ TEST(EnumEvent, DescribesEachEvent) {
     event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
     search.platform.found_events = {event};
     search.platform.muted_cameras = {4};
+    search.platform.mount_cameras[0] = MakeCamera(0, 1);
     search.platform.rec_log_result = 1;
     search.platform.params["recording"] = true;
     search.platform.params["cameralists"] = "4,1,9,0,2,2";
