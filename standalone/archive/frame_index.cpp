@@ -54,12 +54,21 @@ static_assert(sizeof(RawEntry) == 24);
 
 constexpr off_t kMaxFileBytes = sizeof(RawHeader) + off_t{sizeof(RawEntry)} * kMaxTimeMs;
 
-// FNV-1a: any one changed byte changes it, and it is not 0 for zeros.
+// FNV-1a by words, stirred: any one changed word or byte changes it, and it is not 0 for zeros.
 std::uint32_t Checksum(const void* data, std::size_t size) {
     const auto* bytes = static_cast<const std::uint8_t*>(data);
     std::uint32_t sum = 2'166'136'261U;
-    for (std::size_t i = 0; i < size; ++i) {
-        sum = (sum ^ bytes[i]) * 16'777'619U;
+    const auto add = [&](std::uint32_t word) {
+        sum = (sum ^ word) * 16'777'619U;
+        sum ^= sum >> 15;
+    };
+    for (; size >= sizeof(std::uint32_t); size -= sizeof(std::uint32_t), bytes += sizeof(std::uint32_t)) {
+        std::uint32_t word = 0;
+        std::memcpy(&word, bytes, sizeof(word));
+        add(word);
+    }
+    for (; size > 0; --size) {
+        add(*bytes++);
     }
     return sum;
 }

@@ -49,8 +49,10 @@ class Recording::Segment {
             latest_ms_ = std::max(latest_ms_, entries_[i].time_ms);
             waiting_.push_back(static_cast<std::uint32_t>(i));
         }
-        const auto time = [&](std::uint32_t entry) { return entries_[entry].time_ms; };
-        std::stable_sort(waiting_.begin(), waiting_.end(), [&](auto a, auto b) { return time(a) < time(b); });
+        if (reorders_) {
+            const auto time = [&](std::uint32_t entry) { return entries_[entry].time_ms; };
+            std::stable_sort(waiting_.begin(), waiting_.end(), [&](auto a, auto b) { return time(a) < time(b); });
+        }
         const std::size_t kept = grows_ && reorders_ ? std::min(kMaxReordered, waiting_.size()) : 0;
         std::vector<std::uint32_t> placed(waiting_.begin(), waiting_.end() - static_cast<std::ptrdiff_t>(kept));
         waiting_.erase(waiting_.begin(), waiting_.begin() + static_cast<std::ptrdiff_t>(placed.size()));
