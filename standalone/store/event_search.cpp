@@ -192,11 +192,11 @@ MountContent Events::Content(int mount_id) {
     return connection_.Read([&](soci::session& sql) {
         Number events = 0;
         Number size = 0;
-        // Three parts, each of which has an index.
+        // Three parts, each of which has an index of its own; the sign keeps the third from taking another.
         sql << "select count(*), cast(coalesce(sum(size_bytes), 0) as bigint) from ("
                "select size_bytes from events where mount_id = :mount and recording = 0 and archived = 0 and demo = 0"
                " union all select size_bytes from events where mount_id = :mount and archived = 1 and demo = 0"
-               " union all select size_bytes from events where mount_id = :mount and recording = 1 and archived = 0"
+               " union all select size_bytes from events where +mount_id = :mount and recording = 1 and archived = 0"
                " and demo = 0) as held",
             soci::use(mount_id, "mount"), soci::into(events), soci::into(size);
         return MountContent{events, size};

@@ -107,7 +107,7 @@ class Events {
     std::vector<Event> Oldest(int mount_id, int limit);
     // Every row of the mount but a trial's, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
-    // Takes time in proportion to the mount's events: a tenth of a second for a million.
+    // Takes time in proportion to the mount's events: a few tenths of a second for a million.
     MountContent Content(int mount_id);
     // The cameras, removed ones too, that have events on the mount; mount 0: on any.
     std::set<int> CamerasOn(int mount_id);
