@@ -39,6 +39,7 @@ struct Request {
     int id = 0;
     std::string file;
     bool no_sound = false;
+    bool undo = false;
     std::vector<int> cameras;
     int camera = 0;
     int group = 0;
@@ -168,6 +169,17 @@ void Show(const Console& console, const Request& request) {
     console.Answer(text, data);
 }
 
+void Archive(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    if (!Events(store).SetArchived(request.id, !request.undo)) {
+        throw Failure(kNoInput,
+                      "there is no recorded event " + std::to_string(request.id) + ": lookhaven event list names them");
+    }
+    console.Answer("Event " + std::to_string(request.id) +
+                       (request.undo ? " is removed in its turn again." : " is kept, whatever its mount's limits are."),
+                   ToData(*Events(store).Find(request.id)));
+}
+
 void AddMark(const Console& console, const Request& request) {
     const std::int64_t moment = ParseMoment(request.at, NowSeconds());
     std::string text;
@@ -269,6 +281,10 @@ void AddEvent(CLI::App& program, Console& console) {
     list->add_option("--limit", request->limit, "At most so many (else 50)")->check(CLI::NonNegativeNumber);
 
     command("show", "Shows an event", Show)->add_option("id", request->id, "The event's id")->required();
+
+    CLI::App* archive = command("archive", "Keeps a recorded event beyond its mount's limits", Archive);
+    archive->add_option("id", request->id, "The event's id")->required();
+    archive->add_flag("--undo", request->undo, "Keep it no longer than others");
 
     CLI::App* mark = command("mark", "Reports an alert or a sale, whose footage is kept together", AddMark);
     mark->add_option("camera", request->camera, "The camera's id")->required();

@@ -102,6 +102,7 @@ TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
     for (const auto& [options, expected] : rows) {
         Json::Value answer;
         const Outcome outcome = Run("event list --json " + options);
+        EXPECT_EQ(outcome.code, 0) << options << outcome.text;
         std::istringstream(outcome.text) >> answer;
         std::vector<int> ids;
         for (const Json::Value& entry : answer) {
@@ -120,6 +121,10 @@ TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
           {"event show 3", "", 0, "still recording", ""},
           {"event show 1", "", 0, "cannot be read", ""},
           {"event show 99", "", 66, "no event 99", ""},
+          {"event archive 2", "", 0, "is kept", ""},
+          {"event show 2", "", 0, "archived", ""},
+          {"event archive 2 --undo --json", "", 0, "\"archived\" : false", ""},
+          {"event archive 99", "", 66, "no recorded event 99", ""},
           {"event export 1 " + (folder_ / "out.mkv").string(), "", 66, "", ""}});
     EXPECT_FALSE(std::filesystem::exists(folder_ / "out.mkv")) << "what failed leaves nothing behind";
 }
