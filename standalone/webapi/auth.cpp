@@ -6,6 +6,7 @@
 #include "standalone/store/sessions.h"
 #include "standalone/store/users.h"
 #include "standalone/webapi/answer.h"
+#include "standalone/webapi/playback.h"
 
 namespace lookhaven::webapi {
 
@@ -22,11 +23,12 @@ std::string CookieLine(const ScgiRequest& request, const std::string& value) {
            (request.Header("HTTPS") == "on" ? "; Secure\r\n" : "\r\n");
 }
 
-Json::Value Identity(const std::string& account, int user_id, bool is_manager) {
+Json::Value Identity(store::Store& records, const std::string& account, int user_id, bool is_manager) {
     Json::Value data;
     data["account"] = account;
     data["user_id"] = user_id;
     data["is_manager"] = is_manager;
+    data["players_per_session"] = PlayersPerSession(records);
     return data;
 }
 
@@ -44,7 +46,8 @@ std::string LogIn(store::Store& records, const ScgiRequest& request, const Param
     }
     throttle.Clear(account, address);
     const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
-    return SuccessAnswer(Identity(user->name, user->id, user->IsManager()), CookieLine(request, session.secret));
+    return SuccessAnswer(Identity(records, user->name, user->id, user->IsManager()),
+                         CookieLine(request, session.secret));
 }
 
 }  // namespace
@@ -81,7 +84,8 @@ std::string ServeAuth(binding::RequestContext& context, SlotTable& slots, const 
         throw Failure(401, "no session");
     }
     if (method == "Status") {
-        return SuccessAnswer(Identity(login->account, static_cast<int>(login->user_id), login->is_manager));
+        return SuccessAnswer(
+            Identity(context.Records(), login->account, static_cast<int>(login->user_id), login->is_manager));
     }
     store::Sessions(context.Records()).End(login->session_handle);
     slots.EndSession(login->session_handle);

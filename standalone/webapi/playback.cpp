@@ -139,6 +139,12 @@ bool IsPlayer(const std::string& api, const std::string& method) {
     return api == kPlayerApi && (method == kByFrames || method == kByTimes);
 }
 
+int PlayersPerSession(store::Store& records) {
+    const std::string text = store::Settings(records).Find("players_per_session").value_or("1");
+    const Json::Value number = binding::JsonFromText("", text);
+    return number.isInt() ? std::clamp(number.asInt(), 1, kMaxSideBySide) : 1;
+}
+
 void PreparePlayer(Player& player, store::Store& records, const std::string& method, const Parameters& parameters) {
     const bool by_times = method == kByTimes;
     const bool is_paced = IntOr(parameters, "interval", -1) < 0;
@@ -146,9 +152,7 @@ void PreparePlayer(Player& player, store::Store& records, const std::string& met
     player.takes_rate = shares_rate && is_paced;
     player.tells_position = !shares_rate;
     player.can_pause = by_times && is_paced && (shares_rate || IntOr(parameters, "playrate", 1) <= 1);
-    const std::string side_by_side = store::Settings(records).Find("players_per_session").value_or("1");
-    const Json::Value number = binding::JsonFromText("", side_by_side);
-    player.side_by_side = number.isInt() ? std::clamp(number.asInt(), 1, kMaxSideBySide) : 1;
+    player.side_by_side = PlayersPerSession(records);
 }
 
 std::string ServePlayback(const binding::RequestContext& context, SlotTable& slots, const ScgiRequest& request,

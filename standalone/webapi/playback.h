@@ -18,6 +18,10 @@ constexpr const char* kPlaybackApi = "VEXO.Playback";
 // True for the methods that start a player.
 bool IsPlayer(const std::string& api, const std::string& method);
 
+// How many players a session may have side by side: the setting players_per_session, 1 … 16, or 1. Throws
+// store::StoreError.
+int PlayersPerSession(store::Store& records);
+
 // Notes in the slot what the player that these parameters start can do. Throws store::StoreError; Json::Exception for
 // parameters of the wrong type.
 void PreparePlayer(Player& player, store::Store& records, const std::string& method, const Parameters& parameters);

@@ -68,6 +68,9 @@ class Player {
 
 class Playback : public testing::Test {
   protected:
+    // Its players tidy up behind themselves.
+    ~Playback() override { host_.End(SIGTERM); }
+
     Player Play(const std::string& query) {
         Player player(host_, session_.secret, query);
         EXPECT_TRUE(player.Tell("rate")) << query;
