@@ -63,8 +63,11 @@ BAD_REQUESTS = [
     ("e-map", play(1, itemType=1), "admin", {}, 502, 502),
     ("forbidden camera", play(2), "viewer", {}, 504, 504),
     ("forbidden camera, snapshot", play(2, snapshot=1), "viewer", {}, 502, 502),
-    ("playback", call(PLAYER, "PlayMjpegEvent"), "admin", {}, 200, 400),
-    ("search", call(PLAYER, "EnumEvent"), "admin", {}, 200, 400),
+    ("search without a span", call(PLAYER, "EnumEvent"), "admin", {}, 200, 401),
+    ("search in a group that is not there", call(PLAYER, "SearchAvaiDate", camGrpId=99), "admin", {}, 200, 400),
+    ("number of an event that is a text", call(PLAYER, "PlayMjpegEvent", eventid="abc"), "admin", {}, 400, 400),
+    ("steering without a player", call("VEXO.Playback", "GetPosition", timestamp=1), "admin", {}, 404, 404),
+    ("steering by GET", call("VEXO.Playback", "Stop", timestamp=1), "admin", {}, 405, 405),
 ]
 
 

@@ -62,6 +62,15 @@ def program(pid):
     return ""
 
 
+def recorded_events(server, camera, account="admin", **parameters):
+    """The camera's recorded events of the last day, those that grow included, as EnumEvent tells them."""
+    now = int(time.time())
+    query = {"api": "VEXO.Lookhaven.Player", "version": 1, "method": "EnumEvent", "cameralists": camera,
+             "from": now - 86400, "to": now + 3600, "recording": "true", **parameters}
+    cameras = server.request(query, account).json["data"]["camera"]
+    return [event for entry in cameras for event in entry["event"]]
+
+
 class Answer:
     def __init__(self, response, body):
         self.status = response.status
@@ -90,6 +99,7 @@ class Installation:
             "LOOKHAVEN_PORT": str(self.port),
             "LOOKHAVEN_TLS_PORT": str(self.tls_port),
             "LOOKHAVEN_BUILD_FOLDER": str(BUILD),
+            "LOOKHAVEN_DEMO_FOOTAGE": "no",
             **{f"LOOKHAVEN_{account.upper()}_PASSWORD": password for account, password in PASSWORDS.items()},
             **environment,
         }

@@ -1,0 +1,275 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
+# through the web server, also while it is still being recorded; and a session's players give way to each other.
+import contextlib
+import pathlib
+import subprocess
+import time
+import unittest
+
+from installation import Installation, Parts, recorded_events, wait_until
+from painted import NumberReader
+
+PLAYER = {"api": "VEXO.Lookhaven.Player", "version": 1}
+FAR = 10**6
+
+
+def playing(server, event, account="admin", timestamp=1, method="PlayMjpegEvent", cookie=None, **parameters):
+    """The player's stream as a Parts; the caller closes it."""
+    query = {**PLAYER, "method": method, "eventid": event, "timestamp": timestamp, **parameters}
+    headers = {"Cookie": f"id={cookie or server.session(account)}"}
+    return Parts(*server.open(query, headers=headers))
+
+
+def steer(server, method, timestamp=1, account="admin", **form):
+    return server.request(
+        {"api": "VEXO.Playback", "version": 1, "method": method}, account, form={"timestamp": timestamp, **form}
+    )
+
+
+def numbered(parts, count):
+    """Pairs of a number part and the picture after it."""
+    pairs = []
+    while len(pairs) < count:
+        head, body = parts.next()
+        assert head["content-type"] == "text/plain", head
+        picture_head, picture = parts.next()
+        assert picture_head["content-type"] == "image/jpeg", picture_head
+        pairs.append((int(body), picture))
+    return pairs
+
+
+def pictures(parts, count):
+    return [parts.next()[1] for _ in range(count)]
+
+
+class PlaybackTest(unittest.TestCase):
+    """The demo's recordings: 20 s of 640x360 at 25 pictures a second, and the number painted is the frame's."""
+
+    @classmethod
+    def setUpClass(cls):
+        cls.server = cls.enterClassContext(Installation(LOOKHAVEN_DEMO_FOOTAGE="yes"))
+        cls.event = cls.finished(1)
+        with playing(cls.server, cls.event["id"]) as parts:
+            cls.reader = NumberReader([picture for _, picture in numbered(parts, 30)], 640, 360)
+
+    @classmethod
+    def finished(cls, camera):
+        return next(event for event in recorded_events(cls.server, camera) if not event["is_recording"])
+
+    def check(self, pairs, expected):
+        """The numbers told are those expected, and so are those painted."""
+        self.assertEqual([number for number, _ in pairs], expected)
+        self.assertEqual(self.reader.read([picture for _, picture in pairs]), expected)
+
+    def test_shows_the_frames_that_it_names(self):
+        last = self.event["frame_count"] - 1
+        rows = [
+            ({}, [*range(30)]),
+            ({"framestart": 77}, [*range(77, 90)]),
+            ({"playrate": 4}, [*range(0, 40, 4)]),
+            ({"playrate": 16, "framestart": 100, "framestop": 140}, [100, 116, 132, 140, 140, 140]),
+            ({"playrate": -2}, [*range(8)]),
+            ({"interval": 2}, [0, 50, 100]),
+            ({"interval": 0}, [*range(20)]),
+            ({"framestart": last - 2}, [last - 2, last - 1, last, last]),
+        ]
+        for parameters, expected in rows:
+            with self.subTest(parameters), playing(self.server, self.event["id"], **parameters) as parts:
+                self.check(numbered(parts, len(expected)), expected)
+
+    def test_keeps_the_pace_of_the_recording(self):
+        for parameters, seconds in [({}, 2.0), ({"playrate": 8}, 2.0), ({"playrate": -2}, 4.0)]:
+            with self.subTest(parameters), playing(self.server, self.event["id"], **parameters) as parts:
+                numbered(parts, 1)
+                began = time.monotonic()
+                numbered(parts, 50)
+                self.assertAlmostEqual(time.monotonic() - began, seconds, delta=0.3)
+
+    def test_plays_between_times(self):
+        start, frames = 2000, 15
+        with playing(self.server, self.event["id"], method="PlayMjpegEventNoFrameId", startTimeMS=start,
+                     stopTimeMS=start + frames * 40) as parts:
+            shown = []
+            with contextlib.suppress(EOFError):
+                while True:
+                    shown.append(parts.next()[1])
+        self.assertEqual(self.reader.read(shown), [50, *range(50, 50 + frames)], "the first picture comes twice")
+
+    def test_decodes_what_is_no_motion_jpeg(self):
+        event = self.finished(2)
+        self.assertEqual((event["video_type"], event["audio_format"]), (3, "AAC"))
+        for parameters, expected in [
+            ({}, [*range(30)]), ({"framestart": 333}, [*range(333, 350)]), ({"playrate": 16}, [*range(0, 320, 16)]),
+            ({"interval": 5}, [0, 125, 250, 375, 499]), ({"framestart": 499}, [499, 499]),
+        ]:
+            with self.subTest(parameters), playing(self.server, event["id"], **parameters) as parts:
+                self.check(numbered(parts, len(expected)), expected)
+
+    def test_takes_a_new_rate_while_it_plays(self):
+        with playing(self.server, self.event["id"]) as parts:
+            numbers = [number for number, _ in numbered(parts, 3)]
+            self.assertEqual(steer(self.server, "SetRate", rate=4).json["data"], {"rate": 4})
+            numbers += [number for number, _ in numbered(parts, 20)]
+            steps = [after - before for before, after in zip(numbers, numbers[1:])]
+            self.assertEqual(sorted(set(steps)), [1, 4], numbers)
+            self.assertEqual(steps, sorted(steps))
+            self.assertEqual(steer(self.server, "Pause", on="true").status, 409)
+
+    def test_stands_still_while_it_is_paused(self):
+        with playing(self.server, self.event["id"], method="PlayMjpegEventNoFrameId", changerate=1, playrate=2) as parts:
+            pictures(parts, 5)
+            self.assertEqual(steer(self.server, "Pause", on="true").status, 200)
+            pictures(parts, 4)
+            still = self.reader.read(pictures(parts, 6))
+            self.assertEqual(len(set(still)), 1, still)
+            self.assertEqual(steer(self.server, "Pause", on="false").status, 200)
+            moving = self.reader.read(pictures(parts, 10))
+            self.assertLessEqual(max(b - a for a, b in zip([still[-1], *moving], moving)), 2, "nothing is left out")
+            self.assertEqual(moving[-1] - moving[-2], 2, "the rate is back")
+
+    def test_tells_where_it_is(self):
+        with playing(self.server, self.event["id"], method="PlayMjpegEventNoFrameId", startTimeMS=3000) as parts:
+            painted = self.reader.read(pictures(parts, 25))[-1]
+            query = {"api": "VEXO.Playback", "version": 1, "method": "GetPosition", "timestamp": 1}
+            position = self.server.request(query, "admin").json["data"]["position_ms"]
+            self.assertAlmostEqual(position, painted * 40, delta=400)
+            self.assertEqual(steer(self.server, "Stop").status, 200)
+            wait_until(lambda: self.ends(parts), 3, "it stops")
+
+    @staticmethod
+    def ends(parts):
+        try:
+            parts.next()
+        except EOFError:
+            return True
+        return False
+
+    def test_an_older_player_gives_way(self):
+        cookie, other_cookie = self.server.login("admin"), self.server.login("admin")
+        with playing(self.server, self.event["id"], cookie=other_cookie, playrate=-8) as other, \
+             playing(self.server, self.event["id"], cookie=cookie, timestamp=1) as older:
+            numbered(older, 3)
+            with playing(self.server, self.event["id"], cookie=cookie, timestamp=2) as newer:
+                numbered(newer, 1)
+                began = time.monotonic()
+                wait_until(lambda: self.ends(older), 2, "the older one ends")
+                self.assertLess(time.monotonic() - began, 0.5)
+                numbered(newer, 10)
+            numbered(other, 3)
+        # A player that cannot start takes nobody's place.
+        with playing(self.server, self.event["id"], cookie=cookie) as player:
+            with playing(self.server, 999999, cookie=cookie, timestamp=2) as nothing:
+                self.assertEqual(nothing.response.status, 302)
+            numbered(player, 30)
+
+    def test_gives_footage_to_take_along(self):
+        for camera, streams in ((1, "video\n"), (2, "audio\nvideo\n")):
+            event = self.finished(camera)
+            answer = self.server.request(
+                {"api": "VEXO.Event", "version": 1, "method": "Download", "event": event["id"]}, "admin"
+            )
+            self.assertEqual(answer.status, 200)
+            self.assertRegex(answer.headers["Content-Disposition"], r'^attachment; filename="\w+ [-0-9]+ [.0-9]+Z\.mkv"')
+            self.assertEqual("".join(sorted(self.probe(answer.body, "stream=codec_type").splitlines(True))), streams)
+            frames = self.probe(answer.body, "stream=nb_read_frames", "-count_frames", "-select_streams", "v")
+            self.assertEqual(int(frames), event["frame_count"])
+
+    def probe(self, data, entries, *options):
+        done = subprocess.run(
+            ["ffprobe", "-v", "error", *options, "-show_entries", entries, "-of", "csv=p=0", "-"],
+            input=data, capture_output=True, timeout=60,
+        )
+        self.assertEqual(done.stderr, b"")
+        return done.stdout.decode()
+
+    def test_plays_the_footage_of_alerts_and_sales(self):
+        for kind, kind_number in (("alert", 1), ("pos", 2)):
+            query = {"api": "VEXO.Event", "version": 1, "method": "List", "kind": kind, "cameralists": 1}
+            mark = self.server.request(query, "admin").json["data"]["event"][0]
+            self.assertEqual(mark["state"], "saved")
+            with playing(self.server, mark["id"], recEvtType=kind_number) as parts:
+                pairs = numbered(parts, 30)
+            painted = self.reader.read([picture for _, picture in pairs])
+            self.assertEqual([number for number, _ in pairs], [*range(30)])
+            self.assertEqual(painted, [*range(painted[0], painted[0] + 30)])
+            self.assertGreater(painted[0], 0, "the footage begins inside the recording")
+
+    def test_what_is_forbidden_or_gone_does_not_play(self):
+        forbidden = self.finished(2)
+        for parameters in ({"event": forbidden["id"]}, {"event": 999999}, {"event": self.event["id"], "mountid": 99},
+                           {"event": self.event["id"], "recEvtType": 1}, {"event": self.event["id"], "framestart": FAR}):
+            with self.subTest(parameters), playing(self.server, account="viewer", **parameters) as parts:
+                self.assertEqual(parts.response.status, 302)
+                self.assertTrue(parts.response.headers["Location"].endswith("icon_indicator_warning.png"))
+        with playing(self.server, self.event["id"], account="viewer") as parts:
+            self.check(numbered(parts, 3), [0, 1, 2])
+
+    def test_a_recording_that_is_deleted_plays_on(self):
+        event = self.finished(1)
+        mount = next(path for path in self.server.home.rglob(event["name"]))
+        copy = mount.read_bytes()
+        with playing(self.server, event["id"]) as parts:
+            numbered(parts, 3)
+            mount.unlink()
+            try:
+                numbered(parts, 20)
+                with playing(self.server, event["id"], timestamp=2) as gone:
+                    self.assertEqual(gone.response.status, 302)
+            finally:
+                pathlib.Path(mount).write_bytes(copy)
+
+
+class GrowingTest(unittest.TestCase):
+    """What the recorder is writing at the moment."""
+
+    @classmethod
+    def setUpClass(cls):
+        cls.server = cls.enterClassContext(Installation())
+
+    def growing(self):
+        def found():
+            return next((event for event in recorded_events(self.server, 1) if event["is_recording"]), None)
+        return wait_until(lambda: (found() or {"frame_count": 0})["frame_count"] >= 25 and found(), 30, "an event grows")
+
+    def check(self, shown):
+        painted = NumberReader(shown, 1280, 720).read(shown)
+        self.assertEqual(painted, [*range(painted[0], painted[0] + len(shown))])
+
+    def test_is_followed_to_its_end_and_beyond(self):
+        event = self.growing()
+        with playing(self.server, event["id"], framestop=FAR, interval=0) as parts:
+            count = event["frame_count"] + 75
+            pairs = numbered(parts, count)
+        self.assertEqual([number for number, _ in pairs], [*range(count)])
+        self.check([picture for _, picture in pairs])
+
+    def test_is_playable_up_to_this_moment(self):
+        event = self.growing()
+        now_ms = int((time.time() - event["start"]) * 1000)
+        with playing(self.server, event["id"], method="PlayMjpegEventNoFrameId", flushHeader=1,
+                     startTimeMS=now_ms - 1500) as parts:
+            shown = pictures(parts, 26)
+        self.check(shown[1:])
+
+    def test_seeks_in_what_there_is(self):
+        event = self.growing()
+        for start in (0, 20, 7):
+            with playing(self.server, event["id"], framestart=start, framestop=FAR) as parts:
+                pairs = numbered(parts, 25)
+            self.assertEqual([number for number, _ in pairs], [*range(start, start + 25)])
+            self.check([picture for _, picture in pairs])
+
+    def test_pause_at_the_end_does_not_end_it(self):
+        event = self.growing()
+        with playing(self.server, event["id"], method="PlayMjpegEventNoFrameId", flushHeader=1, stopTimeMS=FAR,
+                     startTimeMS=int((time.time() - event["start"]) * 1000) - 500) as parts:
+            pictures(parts, 20)
+            for on in ("true", "false", "true", "false"):
+                self.assertEqual(steer(self.server, "Pause", on=on).status, 200)
+                pictures(parts, 5)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,153 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# What was really recorded is what a search finds, for those who may see it.
+import calendar
+import subprocess
+import time
+import unittest
+
+from installation import Installation, recorded_events, wait_until
+
+PLAYER = {"api": "VEXO.Lookhaven.Player", "version": 1}
+
+
+class SearchTest(unittest.TestCase):
+    """The demo's recordings: 20 s each, some in the last days; both cameras record on."""
+
+    @classmethod
+    def setUpClass(cls):
+        cls.server = cls.enterClassContext(Installation(LOOKHAVEN_DEMO_FOOTAGE="yes"))
+
+    def ask(self, method, account="admin", **parameters):
+        return self.server.request({**PLAYER, "method": method, **parameters}, account).json["data"]
+
+    def days(self, **parameters):
+        return self.ask("SearchAvaiDate", **parameters)["available_day"]
+
+    def recorded(self, camera):
+        """Begin and end of each recording of the camera that lies on the disk, as the file itself tells them."""
+        for path in sorted(self.server.home.rglob(f"{camera}/*/*.mkv")):
+            begin = calendar.timegm(time.strptime(path.parent.name + path.name[:6], "%Y-%m-%d%H%M%S"))
+            probe = ["ffprobe", "-v", "error", "-show_entries", "format=duration", "-of", "csv=p=0", path]
+            length = subprocess.run(probe, capture_output=True, text=True, timeout=60).stdout.strip()
+            if length and length != "N/A":
+                yield begin, begin + round(float(length))
+
+    def test_finds_the_days(self):
+        now = int(time.time())
+        # Days of this zone begin at any time of the day.
+        for start in (now - 5 * 86400, now // 86400 * 86400 - 4 * 86400 + 3600 * 5):
+            spans = list(self.recorded(1))
+            self.assertGreaterEqual(len(spans), 4)
+            expected = [
+                int(any(begin < start + (day + 1) * 86400 and end > start + day * 86400 for begin, end in spans))
+                for day in range(6)
+            ]
+            found = self.days(cameralists="1", start=start, day_count=6)
+            self.assertEqual(found[:4], expected[:4])
+            self.assertIn(1, found)
+        self.assertEqual(self.days(cameralists="1", start=now - 200 * 86400, day_count=100), [0] * 100)
+        self.assertEqual(len(self.days(cameralists="1", start=now, day_count=2**31 - 1)), 128)
+        self.assertIsNone(self.days(cameralists="1", start=now, day_count=-(2**31)))
+        for nobody in ("", ",,", "99", "3", "x,0,-1"):
+            self.assertEqual(self.days(cameralists=nobody, start=now - 86400, day_count=3), [0, 0, 0], nobody)
+
+    def test_finds_what_was_recorded_and_nothing_else(self):
+        to = int(time.time()) - 3600  # what is being recorded now is no part of it
+        start = to - 5 * 86400
+        answer = self.ask("EnumEvent", **{"cameralists": "1,2,1", "from": start, "to": to, "interval": 1})
+        self.assertEqual([entry["camera_id"] for entry in answer["camera"]], [1, 2, 1])
+        for entry in answer["camera"]:
+            camera = entry["camera_id"]
+            spans = [span for span in self.recorded(camera) if span[0] < to]
+            self.assertEqual([(event["start"], event["stop"]) for event in entry["event"]], spans)
+            self.assertEqual(entry["total"], len(spans))
+            seconds = [value for value, count in entry["event_map"]["runs"] for _ in range(count)]
+            self.assertEqual(len(seconds), to - start)
+            covered = {second for begin, end in spans for second in range(begin, end)}
+            self.assertEqual({start + i for i, value in enumerate(seconds) if value == 2}, covered)
+            for event in entry["event"]:
+                self.assertEqual(event["frame_count"], 25 * (event["stop"] - event["start"]))
+                file = next(self.server.home.rglob(event["name"]))
+                self.assertAlmostEqual(event["event_size"] * 2**20, file.stat().st_size, delta=50_000)
+
+    def test_groups_and_mounts_select_cameras(self):
+        now = int(time.time())
+        span = {"cameralists": "1,2,3,4", "from": now - 3600, "to": now}
+        catalog = {"api": "VEXO.Catalog", "version": 1}
+        group = self.server.request({**catalog, "method": "Groups"}, "admin").json["data"]["group"][0]
+        mount = self.server.request({**catalog, "method": "Mounts"}, "admin").json["data"]["mount"][0]
+        self.assertEqual(group["camera"], [1, 2])
+        self.assertEqual(
+            [entry["camera_id"] for entry in self.ask("EnumEvent", camGrpId=group["id"], **span)["camera"]], [1, 2])
+        self.assertEqual(
+            [entry["camera_id"] for entry in self.ask("EnumEvent", mount_id=mount["id"], **span)["camera"]],
+            [camera for camera in (1, 2, 3, 4) if camera in mount["camera"]])
+        self.assertEqual(self.ask("EnumEvent", mount_id=99, **span)["camera"], [])
+        for method in ("EnumEvent", "SearchAvaiDate"):
+            answer = self.server.request({**PLAYER, "method": method, "camGrpId": 99, **span}, "admin")
+            self.assertEqual(answer.code, 400)
+
+    def test_a_forbidden_camera_is_nowhere(self):
+        now = int(time.time())
+        span = {"cameralists": "1,2", "from": now - 3600, "to": now}
+        cameras = self.ask("EnumEvent", "viewer", **span)["camera"]
+        self.assertEqual([entry["camera_id"] for entry in cameras], [1])
+        group = {"camGrpId": 1, **span}
+        self.assertEqual([entry["camera_id"] for entry in self.ask("EnumEvent", "viewer", **group)["camera"]], [1])
+        today = now // 86400 * 86400
+        self.assertEqual(self.days(account="viewer", cameralists="2", start=today - 86400, day_count=3), [0, 0, 0])
+
+    def test_bad_spans_are_answered_at_once(self):
+        rows = [
+            {"from": 5, "to": 5}, {"from": 6, "to": 5}, {"from": -(2**31), "to": 2**31 - 1}, {"from": 0, "to": 33 * 86400},
+        ]
+        for span in rows:
+            with self.subTest(span):
+                answer = self.server.request({**PLAYER, "method": "EnumEvent", "cameralists": "1", **span}, "admin", timeout=5)
+                self.assertEqual(answer.code, 401)
+        now = int(time.time())
+        for interval in (0, -5, -(2**31)):
+            answer = self.ask("EnumEvent", **{"cameralists": "1", "from": now - 60, "to": now, "interval": interval})
+            self.assertEqual(answer["camera"][0]["event_map"]["interval"], 1)
+        many = {"cameralists": ",".join(["x", "", "1"] * 30_000), "from": now - 60, "to": now}
+        answer = self.server.request({**PLAYER, "method": "EnumEvent"}, "admin", form=many)
+        self.assertEqual(len(answer.json["data"]["camera"]), 4096)
+
+
+class RecordedNowTest(unittest.TestCase):
+    """What the recorder records in this very test."""
+
+    @classmethod
+    def setUpClass(cls):
+        cls.server = cls.enterClassContext(Installation())
+        for camera in ("1", "2"):
+            cls.server.cli("camera", "set", camera, "--record", "always", "--segment", "10s")
+        for camera in (1, 2):
+            wait_until(lambda: any(not event["is_recording"] for event in recorded_events(cls.server, camera)), 60, "an event")
+
+    def test_is_found_with_its_coverage(self):
+        now = int(time.time())
+        query = {**PLAYER, "method": "EnumEvent", "cameralists": "1,2", "from": now - 600, "to": now, "interval": 1,
+                 "recording": "true"}
+        for entry in self.server.request(query, "admin").json["data"]["camera"]:
+            seconds = [value for value, count in entry["event_map"]["runs"] for _ in range(count)]
+            self.assertEqual(seconds[0], 0, "nothing before the start")
+            first = min(event["start"] for event in entry["event"]) - (now - 600)
+            self.assertNotIn(0, seconds[first + 1 : -5], "no hole from the first event to a moment ago")
+            for event in entry["event"]:
+                length = max(event["stop"] - event["start"], 1)
+                self.assertAlmostEqual(event["frame_count"], 25 * length, delta=27, msg=event)
+            self.assertEqual([event["is_recording"] for event in entry["event"][-2:]], [False, True])
+        today = now // 86400 * 86400
+        days = self.server.request({**PLAYER, "method": "SearchAvaiDate", "cameralists": "1", "start": today}, "admin")
+        self.assertEqual(days.json["data"]["available_day"], [1])
+
+    def test_is_left_out_while_it_grows_unless_asked_for(self):
+        finished = recorded_events(self.server, 1, recording="false")
+        self.assertTrue(finished)
+        self.assertFalse(any(event["is_recording"] for event in finished))
+
+
+if __name__ == "__main__":
+    unittest.main()
