@@ -11,7 +11,8 @@ if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_L
 endif()
 if(LOOKHAVEN_SANITIZE)
     target_compile_options(lookhaven_options INTERFACE -fsanitize=${LOOKHAVEN_SANITIZE} -fno-sanitize-recover=all)
-    target_link_options(lookhaven_options INTERFACE -fsanitize=${LOOKHAVEN_SANITIZE})
+    # The sanitizer's own dlopen calls the real one, which then looks along the older kind of path only.
+    target_link_options(lookhaven_options INTERFACE -fsanitize=${LOOKHAVEN_SANITIZE} -Wl,--disable-new-dtags)
 endif()
 
 # lookhaven_library(<name> <source>...): a static library of one folder.
