@@ -103,9 +103,10 @@ DemoAmount AddDemoEvents(store::Store& store, int count, int days, std::int64_t 
         new_marks.clear();
     };
     for (int i = 0; i < count; ++i) {
-        const double offset_s = (i / camera_count) * slot_s - span_s;
+        const int slot = i / camera_count;
+        const auto offset_s = static_cast<std::int64_t>(slot * slot_s - span_s);
         const store::Camera& camera = cameras[static_cast<std::size_t>(i % camera_count)];
-        new_events.push_back(inventor.MakeEvent(camera, now_s + static_cast<std::int64_t>(offset_s), i + 1));
+        new_events.push_back(inventor.MakeEvent(camera, now_s + offset_s, i + 1));
         if (i % kEventsPerMark == kEventsPerMark - 1) {
             new_marks.push_back(inventor.MakeMark(new_events.back()));
         }
