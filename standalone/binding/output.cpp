@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdlib>
+#include <utility>
 
 #include <poll.h>
 #include <sys/random.h>
@@ -48,9 +49,10 @@ std::span<iovec> Advance(std::span<iovec> pieces, std::size_t bytes) {
 
 }  // namespace
 
-Output::Output(int socket, OutputLimits limits)
+Output::Output(int socket, OutputLimits limits, std::function<bool()> is_to_leave)
     : socket_(socket),
       limits_(limits),
+      is_to_leave_(std::move(is_to_leave)),
       stream_(::fopencookie(this, "w", {nullptr, &Output::WriteCookie, nullptr, nullptr})),
       replaced_(stdout),
       boundary_(RandomBoundary()) {
@@ -120,7 +122,7 @@ bool Output::WaitUntilWritable(Clock::time_point progress) {
         if (ready > 0) {
             return true;
         }
-        if (ready < 0 && interrupted_until_ == Clock::time_point::max()) {
+        if (ready < 0 && interrupted_until_ == Clock::time_point::max() && is_to_leave_()) {
             interrupted_until_ = Clock::now() + limits_.interrupted;
         }
     }

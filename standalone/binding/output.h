@@ -12,6 +12,7 @@
 #include <chrono>
 #include <cstdint>
 #include <cstdio>
+#include <functional>
 #include <span>
 #include <string>
 
@@ -23,13 +24,15 @@ namespace lookhaven::binding {
 
 struct OutputLimits {
     std::chrono::milliseconds stalled{30'000};     // without the client taking a byte
-    std::chrono::milliseconds interrupted{1'000};  // to finish what a signal interrupted
+    std::chrono::milliseconds interrupted{1'000};  // to finish what a signal interrupted, once the process is to leave
 };
 
 class LH_PLATFORM_API Output {
   public:
-    // Replaces stdout by a stream onto the socket until destruction. The socket is borrowed.
-    explicit Output(int socket, OutputLimits limits = {});
+    // Replaces stdout by a stream onto the socket until destruction. The socket is borrowed. is_to_leave tells whether a
+    // signal is a reason to hurry: one that pauses a player is none, and its viewer may be slow.
+    explicit Output(
+        int socket, OutputLimits limits = {}, std::function<bool()> is_to_leave = [] { return true; });
     ~Output();
     Output(const Output&) = delete;
     Output& operator=(const Output&) = delete;
@@ -52,6 +55,7 @@ class LH_PLATFORM_API Output {
 
     int socket_;
     OutputLimits limits_;
+    std::function<bool()> is_to_leave_;
     std::FILE* stream_;
     std::FILE* replaced_;
     std::string boundary_;

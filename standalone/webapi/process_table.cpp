@@ -88,6 +88,7 @@ void ProcessTable::LeaveEnded() {
 void ProcessTable::BeginLeaving(Process& process) {
     if (!process.leaves_since) {
         process.leaves_since = process.next_signal = Clock::now();
+        process.slot->has_ended = true;
     }
 }
 
@@ -122,6 +123,7 @@ bool ProcessTable::SignalSurplus() {
     for (const std::string& session : slots_.SessionsWithPlayers()) {
         for (const Slot* slot : slots_.SurplusPlayers(session, ReadPlayerFile(session))) {
             if (const auto found = processes_.find(slot->pid); found != processes_.end()) {
+                found->second.slot->player.is_surplus = true;
                 Signal(found->second.pidfd, SIGUSR1);
                 again = true;
             }

@@ -200,7 +200,7 @@ void LeaveHost(pid_t host, SlotTable& slots, int standard_output) {
 }
 
 void RunRequest(const RequestTask& task, const ScgiRequest& request) {
-    binding::Output output(STDOUT_FILENO);
+    binding::Output output(STDOUT_FILENO, {}, [&task] { return task.slot.has_ended || task.slot.player.is_surplus; });
     LimitAddressSpace(true);
     task.slot.pid = ::getpid();
     binding::RequestEvents events;

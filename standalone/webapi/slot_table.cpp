@@ -46,6 +46,7 @@ Slot* SlotTable::Take() {
     slot->has_ended = false;
     slot->pid = 0;
     slot->player.since_us = 0;
+    slot->player.is_surplus = false;
     slot->player.pause_wanted = false;
     slot->player.paused = false;
     slot->player.resumed_rate = 0;

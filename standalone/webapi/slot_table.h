@@ -35,6 +35,7 @@ struct Player {
     bool tells_position;                 // … or the position
     bool can_pause;                      // at rate 1 and slower
     int side_by_side;                    // how many players its session may have
+    std::atomic<bool> is_surplus;        // a newer one has taken its place
     std::atomic<bool> pause_wanted;
     std::atomic<bool> paused;       // the host has told it so
     std::atomic<int> resumed_rate;  // to be set when the pause ends; 0: none
@@ -44,7 +45,7 @@ struct Slot {
     std::atomic<std::uint64_t> serial;  // grows with each request; 0: free
     std::atomic<bool> is_stream;
     std::atomic<bool> has_session;
-    std::atomic<bool> has_ended;  // the session or the player is over: the host is to end the process
+    std::atomic<bool> has_ended;  // session, player or client is gone: the process is to end
     std::atomic<pid_t> pid;
     std::array<char, 64> session;
     Player player;

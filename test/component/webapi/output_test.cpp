@@ -57,8 +57,8 @@ class OutputTest : public testing::Test {
         setitimer(ITIMER_REAL, &timer, nullptr);
     }
 
-    void Open(OutputLimits limits = {}) {
-        output_ = std::make_unique<Output>(server_.Get(), limits);
+    void Open(OutputLimits limits = {}, bool is_to_leave = true) {
+        output_ = std::make_unique<Output>(server_.Get(), limits, [is_to_leave] { return is_to_leave; });
         RequestContext::Current().Begin(base::Installation("/tmp"), output_.get(), {});
     }
     // Reads all that comes, in a thread of its own that takes no signals.
@@ -215,6 +215,21 @@ TEST_F(OutputTest, WaitsForASlowClient) {
     const std::string picture(1'000'000, 'x');  // takes longer than the limit, but never without progress
     EXPECT_EQ(response.Write("image/jpeg", picture.data(), static_cast<int>(picture.size()), nullptr), 0);
     EXPECT_EQ(Parts(FinishReading()), std::vector{picture});
+}
+
+TEST_F(OutputTest, FinishesASlowPartUnlessItIsToLeave) {
+    StartReading(2ms);
+    for (const bool is_to_leave : {false, true}) {
+        output_.reset();
+        Open({60s, 50ms}, is_to_leave);
+        Tick(5ms);
+        MultipartResponse response;
+        const std::string picture(1'000'000, 'x');
+        EXPECT_EQ(response.Write("image/jpeg", picture.data(), static_cast<int>(picture.size()), nullptr),
+                  is_to_leave ? -1 : 0);
+        Tick(0us);
+    }
+    FinishReading();
 }
 
 }  // namespace
