@@ -3,6 +3,7 @@
 # What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
 # through the web server, also while it is still being recorded; and a session's players give way to each other.
 import contextlib
+import os
 import pathlib
 import subprocess
 import time
@@ -205,6 +206,22 @@ class PlaybackTest(unittest.TestCase):
                 self.assertTrue(parts.response.headers["Location"].endswith("icon_indicator_warning.png"))
         with playing(self.server, self.event["id"], account="viewer") as parts:
             self.check(numbered(parts, 3), [0, 1, 2])
+
+    def test_players_hold_neither_the_store_nor_libraries_that_they_do_not_need(self):
+        def loads_decoder(pid):
+            return "libavcodec" in pathlib.Path(f"/proc/{pid}/maps").read_text()
+
+        for camera, decodes in ((1, False), (2, True)):
+            event = self.finished(camera)
+            before = self.server.requests()
+            with playing(self.server, event["id"]) as parts:
+                numbered(parts, 3)
+                (player,) = self.server.requests() - before
+                open_files = [os.readlink(path) for path in pathlib.Path(f"/proc/{player}/fd").iterdir()]
+                self.assertFalse([path for path in open_files if "lookhaven.db" in path])
+                self.assertTrue([path for path in open_files if path.endswith(event["name"])], open_files)
+                self.assertEqual(loads_decoder(player), decodes)
+        self.assertFalse(loads_decoder(self.server.part("webapi")), "each fork would pay for it")
 
     def test_a_recording_that_is_deleted_plays_on(self):
         event = self.finished(1)
