@@ -264,11 +264,17 @@ class GrowingTest(unittest.TestCase):
 
     def test_is_playable_up_to_this_moment(self):
         event = self.growing()
-        now_ms = int((time.time() - event["start"]) * 1000)
+        wait_until(lambda: time.time() - event["start"] > 4, 10, "some footage")
+        start_ms = int((time.time() - event["start"]) * 1000) - 2500
+        shown = []
         with playing(self.server, event["id"], method="PlayMjpegEventNoFrameId", flushHeader=1,
-                     startTimeMS=now_ms - 1500) as parts:
-            shown = pictures(parts, 26)
+                     startTimeMS=start_ms) as parts, contextlib.suppress(EOFError):
+            while True:
+                shown.append(parts.next()[1])
         self.check(shown[1:])
+        # The event began up to a second after the whole second that the list tells.
+        self.assertGreaterEqual(len(shown), 25 * 1.5 - 8)
+        self.assertLess(len(shown), 25 * 2.5 + 25, "it ends where the recording was when it was asked for")
 
     def test_seeks_in_what_there_is(self):
         event = self.growing()
