@@ -1,43 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Drives Chromium through one visit: node browser.mjs <address> <password> <folder for pictures>. Writes a line of JSON
-// after each step and waits for a line before the next, so that the caller can look at the server in between.
-import { createInterface } from "node:readline";
-import { chromium } from "playwright-core";
+// One visit: log in, see camera 1 move, take a snapshot, log out.
+import { address, folder, logIn, report, visit } from "./chromium.mjs";
 
-const [address, password, folder] = process.argv.slice(2);
-const lines = createInterface({ input: process.stdin })[Symbol.asyncIterator]();
-
-async function report(step, facts = {}) {
-  console.log(JSON.stringify({ step, ...facts }));
-  await lines.next();
-}
-
-const browser = await chromium.launch({
-  executablePath: "/usr/bin/chromium",
-  args: ["--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run"].concat([
-    "--disable-background-networking",
-    "--disable-component-update",
-    "--disable-sync",
-  ]),
-});
-try {
-  const context = await browser.newContext({ ignoreHTTPSErrors: true, viewport: { width: 1280, height: 800 } });
-  const page = await context.newPage();
-  const complaints = [];
-  page.on("pageerror", (error) => complaints.push(String(error)));
-  // Answers of the server are judged by what the page makes of them; this is about scripts and the content policy.
-  page.on("console", (message) => {
-    if (message.type() === "error" && !message.text().startsWith("Failed to load resource")) complaints.push(message.text());
-  });
-
+await visit(async (page, complaints) => {
   await page.goto(address);
-  await page.getByLabel("Account").fill("admin");
-  await page.getByLabel("Password").fill("wrong");
-  await page.getByRole("button", { name: "Log in" }).click();
+  await logIn(page, "wrong");
   await page.getByRole("alert").filter({ hasText: "wrong" }).waitFor();
-  await page.getByLabel("Password").fill(password);
-  await page.getByRole("button", { name: "Log in" }).click();
+  await logIn(page);
 
   const tile = page.locator('[data-camera="1"]');
   await page.locator('[data-camera="1"][data-state="live"]').waitFor({ timeout: 15_000 });
@@ -74,6 +44,4 @@ try {
   await page.getByRole("button", { name: "Log out admin" }).click();
   await page.getByRole("button", { name: "Log in" }).waitFor();
   await report("logged out", { complaints });
-} finally {
-  await browser.close();
-}
+});

@@ -1,48 +1,15 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# A visit in Chromium: log in, see camera 1 move, take a snapshot, log out; and what the server then still runs.
-import contextlib
-import json
+# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab. And what the
+# server then still runs.
 import os
-import pathlib
 import shutil
 import subprocess
 import tempfile
 import unittest
 
-from installation import PASSWORDS, Installation, wait_until
-
-HERE = pathlib.Path(__file__).resolve().parent
-
-
-class Visit:
-    """The browser's script, stopped after each step that it reports."""
-
-    def __init__(self, address, folder):
-        self._script = subprocess.Popen(
-            [shutil.which("node"), HERE / "browser.mjs", address, PASSWORDS["admin"], folder],
-            stdin=subprocess.PIPE,
-            stdout=subprocess.PIPE,
-            text=True,
-        )
-
-    def __enter__(self):
-        return self
-
-    def __exit__(self, *_):
-        with contextlib.suppress(BrokenPipeError):
-            self._script.stdin.close()
-        self._script.terminate()
-        self._script.wait(20)
-        self._script.stdout.close()
-
-    def next(self):
-        line = self._script.stdout.readline()
-        return json.loads(line) if line else {"step": f"the browser's script ended: {self._script.wait(20)}"}
-
-    def go_on(self):
-        self._script.stdin.write("\n")
-        self._script.stdin.flush()
+from installation import Installation, wait_until
+from visit import Visit
 
 
 class BrowserTest(unittest.TestCase):
@@ -52,10 +19,31 @@ class BrowserTest(unittest.TestCase):
     def test_a_visit_over_http(self):
         self.visit(lambda server: f"http://127.0.0.1:{server.port}/", "http/1.1")
 
+    def test_a_camera_with_sound_is_drawn_and_heard_and_left_when_the_tab_is_hidden(self):
+        with Installation() as server:
+            idle = server.requests()
+            with Visit("muxed.mjs", f"https://localhost:{server.tls_port}/") as visit:
+                for step, is_heard in ("watched", False), ("heard", True):
+                    seen = visit.next()
+                    self.assertEqual(seen["step"], step)
+                    self.assertGreaterEqual(seen["moments"] / seen["seconds"], 20, "different pictures a second")
+                    self.assertEqual(seen["peak"] > 0.01, is_heard, f"{step}: loudest sample {seen['peak']}")
+                    visit.go_on()
+
+                self.assertEqual(visit.next()["step"], "hidden")
+                wait_until(lambda: server.requests() == idle, 2, "the stream of a hidden tab ends")
+                visit.go_on()
+
+                seen = visit.next()
+                self.assertEqual(seen["step"], "seen again")
+                self.assertGreater(len(server.requests()), len(idle), "nothing streams")
+                self.assertEqual(seen["complaints"], [])
+                visit.go_on()
+
     def visit(self, address, protocol):
         with Installation() as server, tempfile.TemporaryDirectory() as folder:
             idle = server.requests()
-            with Visit(address(server), folder) as visit:
+            with Visit("browser.mjs", address(server), folder) as visit:
                 seen = visit.next()
                 self.assertEqual(seen["step"], "streaming")
                 self.assertEqual(seen["pictures"], 3, "camera 1 stands still")

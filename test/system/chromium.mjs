@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit writes a
+// line of JSON after each step and waits for a line before the next, so that the caller can look at the server in between.
+import { createInterface } from "node:readline";
+import { chromium } from "playwright-core";
+
+export const [address, password, folder] = process.argv.slice(2);
+const lines = createInterface({ input: process.stdin })[Symbol.asyncIterator]();
+
+export async function report(step, facts = {}) {
+  console.log(JSON.stringify({ step, ...facts }));
+  await lines.next();
+}
+
+/** Gives the page, and a list that fills with what scripts and the content policy complain of. */
+export async function visit(body) {
+  const browser = await chromium.launch({
+    executablePath: "/usr/bin/chromium",
+    args: ["--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run"].concat([
+      "--disable-background-networking",
+      "--disable-component-update",
+      "--disable-sync",
+    ]),
+  });
+  try {
+    const context = await browser.newContext({ ignoreHTTPSErrors: true, viewport: { width: 1280, height: 800 } });
+    const page = await context.newPage();
+    const complaints = [];
+    page.on("pageerror", (error) => complaints.push(String(error)));
+    // Answers of the server are judged by what the page makes of them.
+    page.on("console", (message) => {
+      if (message.type() === "error" && !message.text().startsWith("Failed to load resource")) complaints.push(message.text());
+    });
+    await body(page, complaints);
+  } finally {
+    await browser.close();
+  }
+}
+
+export async function logIn(page, word = password) {
+  await page.getByLabel("Account").fill("admin");
+  await page.getByLabel("Password").fill(word);
+  await page.getByRole("button", { name: "Log in" }).click();
+}
