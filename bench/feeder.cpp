@@ -2,7 +2,8 @@
 //
 // Stands in for the recorder: fills one camera's ring with stamped pictures at a steady rate until it gets SIGTERM.
 //
-// Arguments: camera, bytes of a picture, pictures a second. The installation is the one of LOOKHAVEN_HOME.
+// Arguments: camera, codec's name, bytes of a picture, pictures a second. Other codecs than MJPEG have a key frame a
+// second. The installation is the one of LOOKHAVEN_HOME.
 #include <atomic>
 #include <csignal>
 #include <cstdlib>
@@ -22,14 +23,14 @@ using namespace lookhaven;
 
 volatile std::sig_atomic_t g_stop = 0;
 
-int Run(int camera, std::size_t frame_bytes, int frames_per_second) {
+int Run(int camera, const std::string& codec, std::size_t frame_bytes, int frames_per_second) {
     const auto installation = base::Installation::FromEnvironment();
     ring::CommonConfigKeeper common(installation);
     ring::StreamFormat format;
-    format.codec = "MJPEG";
-    format.every_frame_is_key = true;
+    format.codec = codec;
+    format.every_frame_is_key = codec == "MJPEG";
     ring::StreamEstimate estimate;
-    estimate.every_frame_is_key = true;
+    estimate.every_frame_is_key = format.every_frame_is_key;
     estimate.largest_frame_bytes = static_cast<std::int64_t>(frame_bytes);
     estimate.bits_per_second = estimate.largest_frame_bytes * 8 * frames_per_second;
     estimate.frames_per_second = frames_per_second;
@@ -38,13 +39,13 @@ int Run(int camera, std::size_t frame_bytes, int frames_per_second) {
     std::vector<char> picture = bench::MakeFrame(frame_bytes);
     ring::Frame frame;
     frame.data = {reinterpret_cast<const unsigned char*>(picture.data()), picture.size()};
-    frame.is_key = true;
     timespec next{};
     clock_gettime(CLOCK_MONOTONIC, &next);
     for (int number = 0; g_stop == 0; ++number) {
         if (number % frames_per_second == 0) {
             common.Refresh(false);
         }
+        frame.is_key = format.every_frame_is_key || number % frames_per_second == 0;
         frame.timestamp_micros = base::MonotonicMicros();
         frame.capture_millis = base::WallMillis();
         bench::WriteStamp(picture.data(), frame.timestamp_micros);
@@ -60,14 +61,15 @@ int Run(int camera, std::size_t frame_bytes, int frames_per_second) {
 }  // namespace
 
 int main(int count, char** arguments) try {
-    if (count != 4) {
-        std::cerr << "usage: bench_feeder CAMERA FRAME_BYTES FRAMES_PER_SECOND\n";
+    if (count != 5) {
+        std::cerr << "usage: bench_feeder CAMERA CODEC FRAME_BYTES FRAMES_PER_SECOND\n";
         return 64;
     }
     struct sigaction stop {};
     stop.sa_handler = [](int) { g_stop = 1; };
     sigaction(SIGTERM, &stop, nullptr);
-    return Run(std::atoi(arguments[1]), std::strtoull(arguments[2], nullptr, 10), std::atoi(arguments[3]));
+    return Run(std::atoi(arguments[1]), arguments[2], std::strtoull(arguments[3], nullptr, 10),
+               std::atoi(arguments[4]));
 } catch (const std::exception& error) {
     std::cerr << "bench_feeder: " << error.what() << '\n';
     return 1;

@@ -106,12 +106,12 @@ class Stand:
         log = open(self._home / "log" / f"{name}.log", "w")
         self._processes[name] = subprocess.Popen(command, stdout=log, stderr=log, env=self._environment)
 
-    def add_camera(self, name, source):
-        self._run("camera", "add", "--name", name, "--type", "mjpeg", "--source", source)
+    def add_camera(self, name, source, video_type="mjpeg"):
+        self._run("camera", "add", "--name", name, "--type", video_type, "--source", source)
 
-    def start_feeder(self, camera, frame_bytes, frames_per_second):
+    def start_feeder(self, camera, codec, frame_bytes, frames_per_second):
         self._start(
-            "feeder", self._bin / "bench_feeder", str(camera), str(frame_bytes), str(frames_per_second)
+            "feeder", self._bin / "bench_feeder", str(camera), codec, str(frame_bytes), str(frames_per_second)
         )
 
     def start_host(self):
