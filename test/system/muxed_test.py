@@ -104,6 +104,21 @@ class MuxedTest(unittest.TestCase):
         with self.server.live(2, "viewer") as refused:
             self.assertEqual(refused.response.status, 504)
 
+    def test_a_stream_ends_when_its_camera_becomes_another_and_begins_anew(self):
+        camera = self.server.add_camera("Changing", "test:h264?size=320x240&fps=25")
+        with self.server.live(camera) as stream:
+            stream.next()
+            self.server.cli("camera", "set", str(camera), "--source", "test:h264?size=640x480&fps=25")
+            changed = time.monotonic()
+            with self.assertRaises(EOFError):
+                while True:
+                    stream.next()
+            # Without a picture it would stand still for 20 s.
+            self.assertLess(time.monotonic() - changed, 8)
+        frame = self.take(camera, "admin", 0)[0][1]
+        grey = ffmpeg("-f", "h264", "-i", "-", "-frames:v", "1", "-pix_fmt", "gray", "-f", "rawvideo", data=frame)
+        self.assertEqual(len(grey), 640 * 480)
+
     def test_picture_of_any_codec(self):
         parts = self.take(2, "admin", 0)
         answer = self.picture(camera=2)
