@@ -1,70 +1,55 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/recorder/catalog.h"
 
-#include <exception>
 #include <utility>
 
-#include "standalone/base/blocked_signals.h"
-#include "standalone/base/log.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::recorder {
 
-Catalog::Catalog(std::string store_url, std::function<void()> on_change)
-    : store_url_(std::move(store_url)),
-      on_change_(std::move(on_change)) {
-    const base::BlockedSignals blocked;
-    thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
+namespace {
+
+// A camera without a plan of its own keeps no footage from before a mark, since its stream would have to run always.
+CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::RecordingPlan>& plans,
+                  store::Mounts& mounts) {
+    const auto found = plans.find(camera.id);
+    store::RecordingPlan plan;
+    plan.pre_s = 0;
+    if (found != plans.end()) {
+        plan = found->second;
+    }
+    const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
+    CameraPlan result{
+        camera.name, plan.mode, plan.segment_s, plan.pre_s, has_profile ? plan.profile : camera.live_profile, 0, {}};
+    if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id); mount && mount->enabled) {
+        result.mount_id = mount->id;
+        result.mount = mount->path;
+    }
+    return result;
 }
 
-void Catalog::Refresh() {
-    const std::lock_guard lock(mutex_);
-    is_asked_ = true;
-    asked_.notify_one();
-}
+}  // namespace
 
-std::shared_ptr<const Catalog::Streams> Catalog::Current() const {
+Catalog::Catalog(const std::string& store_url, std::function<void()> on_change)
+    : on_change_(std::move(on_change)),
+      thread_(store_url, "read the cameras", [this](store::Store& store, const std::stop_token&) { Read(store); }) {}
+
+std::shared_ptr<const CatalogContents> Catalog::Current() const {
     const std::lock_guard lock(mutex_);
     return current_;
 }
 
-void Catalog::Run(const std::stop_token& stop) {
-    for (std::unique_lock lock(mutex_); asked_.wait(lock, stop, [this] { return is_asked_; });) {
-        is_asked_ = false;
-        lock.unlock();
-        TryToRead();
-        lock.lock();
-    }
-    has_ended_ = true;
-}
-
-void Catalog::TryToRead() noexcept {
-    try {
-        Read();
-        if (!std::exchange(reported_failure_, {}).empty()) {
-            base::LogInfo("the store can be read again");
-        }
-    } catch (const std::exception& failure) {
-        store_.reset();
-        if (failure.what() != reported_failure_) {
-            reported_failure_ = failure.what();
-            base::LogError("cannot read the cameras, running streams go on: " + reported_failure_);
-        }
-    }
-}
-
-void Catalog::Read() {
-    if (!store_) {
-        store_.emplace(store::Store::Open(store_url_));
-    }
+void Catalog::Read(store::Store& store) {
     // Read before the cameras: a change in between is then seen the next time.
-    const std::int64_t revision = store::Settings(*store_).Revision();
+    const std::int64_t revision = store::Settings(store).Revision();
     if (revision == revision_) {
         return;
     }
-    store::Cameras cameras(*store_);
-    auto streams = std::make_shared<Streams>();
+    store::Cameras cameras(store);
+    store::Mounts mounts(store);
+    const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(store).List();
+    auto contents = std::make_shared<CatalogContents>();
     for (const store::Camera& camera : cameras.List()) {
         if (!camera.enabled) {
             continue;
@@ -75,13 +60,14 @@ void Catalog::Read() {
             if (credentials) {
                 plan.credentials = {credentials->account, credentials->password};
             }
-            streams->emplace(ring::LiveStream{camera.id, profile.number}, std::move(plan));
+            contents->streams.emplace(ring::LiveStream{camera.id, profile.number}, std::move(plan));
         }
+        contents->cameras.emplace(camera.id, PlanOf(camera, plans, mounts));
     }
     revision_ = revision;
     {
         const std::lock_guard lock(mutex_);
-        current_ = std::move(streams);
+        current_ = std::move(contents);
     }
     on_change_();
 }

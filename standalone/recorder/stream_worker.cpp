@@ -33,6 +33,11 @@ StreamWorker::StreamWorker(const base::Installation& installation, ring::LiveStr
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
 
+void StreamWorker::SetRecording(std::shared_ptr<FrameQueue> queue) {
+    const std::lock_guard lock(mutex_);
+    recording_ = std::move(queue);
+}
+
 void StreamWorker::Run(const std::stop_token& stop) {
     {
         StreamRings rings(installation_, stream_);
@@ -59,6 +64,12 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
     for (;;) {
         const media::Packet packet = source->Next();
         rings.Write(packet, source->Audio());
+        {
+            const std::lock_guard lock(mutex_);
+            if (recording_) {
+                recording_->Push(packet, source->Audio());
+            }
+        }
         if (packet.medium == media::Medium::kVideo) {
             backoff_.NotePicture(base::MonotonicMicros());
         }

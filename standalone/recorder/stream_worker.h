@@ -6,6 +6,8 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <memory>
+#include <mutex>
 #include <optional>
 #include <stop_token>
 #include <string>
@@ -14,6 +16,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/media/source.h"
 #include "standalone/recorder/backoff.h"
+#include "standalone/recorder/frame_queue.h"
 #include "standalone/recorder/stream_rings.h"
 #include "standalone/ring/demand.h"
 
@@ -38,6 +41,9 @@ class StreamWorker {
 
     const StreamPlan& Plan() const { return plan_; }
 
+    // Where frames go beside the rings; null: nowhere.
+    void SetRecording(std::shared_ptr<FrameQueue> queue);
+
     // Asks the thread to end and does not wait for it; the rings are gone when it has.
     void RequestStop() { thread_.request_stop(); }
     // Once true, destruction does not wait.
@@ -56,6 +62,8 @@ class StreamWorker {
     const media::SourceOptions options_;
     Backoff backoff_;
     std::string reported_failure_;  // empty when the last report was another
+    std::mutex mutex_;
+    std::shared_ptr<FrameQueue> recording_;
     std::atomic<bool> has_ended_ = false;
     std::jthread thread_;  // last: it uses the others
 };

@@ -25,7 +25,8 @@ Supervisor::Supervisor(const base::Installation& installation, std::chrono::mill
       no_data_limit_(no_data_limit),
       demand_(installation),
       common_config_(installation),
-      catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }) {
+      catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }),
+      recordings_(installation, no_data_limit) {
     DoEverySecond();
     Reconcile();  // wishes may be older than this recorder
 }
@@ -40,11 +41,12 @@ void Supervisor::Step() {
 
 bool Supervisor::Finish(std::chrono::milliseconds limit) {
     catalog_.RequestStop();
+    recordings_.RequestStop();
     for (const auto& [stream, worker] : workers_) {
         worker->RequestStop();
     }
     const std::int64_t end_us = base::MonotonicMicros() + std::chrono::microseconds(limit).count();
-    while (DropEndedWorkers(), !workers_.empty() || !catalog_.HasEnded()) {
+    while (DropEndedWorkers(), !workers_.empty() || !catalog_.HasEnded() || !recordings_.HasEnded()) {
         const std::int64_t now_us = base::MonotonicMicros();
         if (now_us >= end_us) {
             return false;
@@ -68,6 +70,7 @@ void Supervisor::DoEverySecond() {
                   : base::LogError("another process holds the common record's lock");
     }
     catalog_.Refresh();
+    recordings_.DoEverySecond();
     if (seconds_++ % kOrphanSearchSeconds == 0) {
         if (const std::size_t removed = ring::RemoveOrphans(installation_); removed > 0) {
             base::LogInfo("removed " + std::to_string(removed) + " segments of a dead recorder");
@@ -76,11 +79,14 @@ void Supervisor::DoEverySecond() {
 }
 
 void Supervisor::Reconcile() {
-    const std::vector<ring::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
-    const std::shared_ptr<const Catalog::Streams> catalog = catalog_.Current();
+    const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
+    recordings_.Reconcile(*catalog);
+    std::vector<ring::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
+    const std::vector<ring::LiveStream> recorded = recordings_.Wanted();
+    wanted.insert(wanted.end(), recorded.begin(), recorded.end());
     std::map<ring::LiveStream, StreamPlan> plans;
     for (const ring::LiveStream& stream : wanted) {
-        if (const auto plan = catalog->find(stream); plan != catalog->end()) {
+        if (const auto plan = catalog->streams.find(stream); plan != catalog->streams.end()) {
             plans.insert(*plan);
         }
     }
@@ -96,6 +102,9 @@ void Supervisor::Reconcile() {
     for (const auto& [stream, plan] : plans) {
         if (!workers_.contains(stream)) {
             Start(stream, plan);
+        }
+        if (const auto worker = workers_.find(stream); worker != workers_.end()) {
+            worker->second->SetRecording(recordings_.QueueOf(stream));
         }
     }
 }

@@ -14,6 +14,7 @@
 
 #include "standalone/base/installation.h"
 #include "standalone/recorder/catalog.h"
+#include "standalone/recorder/recordings.h"
 #include "standalone/recorder/stream_worker.h"
 #include "standalone/ring/common_config.h"
 #include "standalone/ring/demand.h"
@@ -45,6 +46,7 @@ class Supervisor {
     ring::Demand demand_;
     ring::CommonConfigKeeper common_config_;
     Catalog catalog_;
+    Recordings recordings_;
     std::map<ring::LiveStream, std::unique_ptr<StreamWorker>> workers_;
     std::int64_t next_second_us_ = 0;
     std::int64_t seconds_ = 0;

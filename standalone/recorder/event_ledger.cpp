@@ -1,0 +1,153 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/event_ledger.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "standalone/base/log.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+// With segments of five minutes, a recorder gets through twenty minutes without its store.
+constexpr std::size_t kIdsPerCamera = 4;
+
+}  // namespace
+
+EventLedger::EventLedger(const std::string& store_url)
+    : thread_(store_url, "store the events, recording goes on",
+              [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
+
+std::optional<int> EventLedger::TakeId() {
+    const std::lock_guard lock(mutex_);
+    if (reserve_.empty()) {
+        return std::nullopt;
+    }
+    const int id = reserve_.front();
+    reserve_.pop_front();
+    return id;
+}
+
+bool EventLedger::HasId() const {
+    const std::lock_guard lock(mutex_);
+    return !reserve_.empty();
+}
+
+void EventLedger::Put(const store::Event& row) {
+    bool is_urgent = !row.recording;
+    {
+        const std::lock_guard lock(mutex_);
+        const auto [entry, is_new] = entries_.try_emplace(row.id);
+        entry->second.row = row;
+        entry->second.is_dirty = true;
+        is_urgent = is_urgent || is_new;
+    }
+    if (is_urgent) {
+        thread_.Ask();
+    }
+}
+
+void EventLedger::Refresh(std::size_t cameras) {
+    {
+        const std::lock_guard lock(mutex_);
+        wanted_reserve_ = cameras * kIdsPerCamera;
+    }
+    thread_.Ask();
+}
+
+std::vector<store::Mark> EventLedger::PendingMarks() const {
+    const std::lock_guard lock(mutex_);
+    return pending_marks_;
+}
+
+std::optional<int> EventLedger::FirstOwnId() const {
+    const std::lock_guard lock(mutex_);
+    return first_own_id_;
+}
+
+void EventLedger::RequestStop() {
+    thread_.Ask();
+    thread_.RequestStop();
+}
+
+void EventLedger::Work(store::Store& store) {
+    store::Events events(store);
+    std::vector<int> dirty;
+    {
+        const std::lock_guard lock(mutex_);
+        for (const auto& [id, entry] : entries_) {
+            if (entry.is_dirty) {
+                dirty.push_back(id);
+            }
+        }
+    }
+    for (const int id : dirty) {
+        StoreRow(events, id);
+    }
+    FillReserve(events);
+    std::vector<store::Mark> pending = store::Marks(store).Pending();
+    const std::lock_guard lock(mutex_);
+    pending_marks_ = std::move(pending);
+}
+
+void EventLedger::FillReserve(store::Events& events) {
+    std::size_t missing = 0;
+    bool is_first = false;
+    {
+        const std::lock_guard lock(mutex_);
+        is_first = !first_own_id_;
+        if (reserve_.size() * 2 <= wanted_reserve_ || is_first) {
+            missing = wanted_reserve_ - reserve_.size();
+        }
+    }
+    if (missing == 0 && !is_first) {
+        return;
+    }
+    const int count = static_cast<int>(std::max<std::size_t>(missing, 1));
+    const int first = events.NextIds(count);
+    const std::lock_guard lock(mutex_);
+    first_own_id_ = first_own_id_.value_or(first);
+    for (int id = first; id < first + count; ++id) {
+        reserve_.push_back(id);
+    }
+}
+
+void EventLedger::StoreRow(store::Events& events, int id) {
+    Entry entry;
+    {
+        const std::lock_guard lock(mutex_);
+        entry = entries_.at(id);
+        entries_.at(id).is_dirty = false;
+    }
+    const store::Event& row = entry.row;
+    try {
+        if (!entry.is_stored) {
+            events.Begin(row);
+        } else if (row.recording) {
+            events.Grow(id, row.end_s, row.frame_count, row.size_bytes);
+        } else {
+            events.Finish(id, row.end_s, row.frame_count, row.size_bytes);
+        }
+    } catch (const store::AlreadyExists&) {
+        // An answer was lost on the way, or somebody took the file in. What the row says now goes in with the next round.
+        const std::lock_guard lock(mutex_);
+        entries_.at(id).is_stored = true;
+        entries_.at(id).is_dirty = true;
+        thread_.Ask();
+        return;
+    } catch (const store::InvalidRecord& failure) {
+        base::LogError("event " + std::to_string(id) + " cannot be stored: " + failure.what());
+    } catch (...) {
+        const std::lock_guard lock(mutex_);
+        entries_.at(id).is_dirty = true;
+        throw;
+    }
+    const std::lock_guard lock(mutex_);
+    entries_.at(id).is_stored = true;
+    if (!row.recording) {
+        entries_.erase(id);
+    }
+}
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/frame_queue.h"
+
+#include <chrono>
+#include <utility>
+
+namespace lookhaven::recorder {
+
+media::Packet Frame::Packet() const {
+    return {medium, data, timestamp_us, key_frame, medium == media::Medium::kVideo ? &format->video : &*format->audio};
+}
+
+void FrameQueue::Push(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
+    const std::lock_guard lock(mutex_);
+    SetFormat(packet, audio);
+    const bool is_video = packet.medium == media::Medium::kVideo;
+    if (!format_ || (!is_video && !format_->audio)) {
+        return;
+    }
+    const bool fits = queued_bytes_ + packet.data.size() <= capacity_bytes_;
+    losses_.now = losses_.now ? !(fits && is_video && packet.key_frame) : !fits;
+    if (losses_.now) {
+        losses_.frames += is_video ? 1 : 0;
+        return;
+    }
+    frames_.push_back(
+        {format_, packet.medium, {packet.data.begin(), packet.data.end()}, packet.timestamp_us, packet.key_frame});
+    queued_bytes_ += packet.data.size();
+    changed_.notify_one();
+}
+
+// The frames of one format share it.
+void FrameQueue::SetFormat(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
+    if (packet.medium == media::Medium::kVideo &&
+        (!format_ || format_->video != *packet.format || format_->audio != audio)) {
+        format_ = std::make_shared<const RunFormat>(RunFormat{*packet.format, audio});
+    }
+}
+
+std::optional<Frame> FrameQueue::Pop(std::int64_t until_us) {
+    std::unique_lock lock(mutex_);
+    const std::chrono::steady_clock::time_point until{std::chrono::microseconds(until_us)};
+    changed_.wait_until(lock, until, [this] { return woken_ || !frames_.empty(); });
+    woken_ = false;
+    if (frames_.empty()) {
+        return std::nullopt;
+    }
+    std::optional<Frame> frame(std::move(frames_.front()));
+    frames_.pop_front();
+    queued_bytes_ -= frame->data.size();
+    return frame;
+}
+
+void FrameQueue::Wake() {
+    const std::lock_guard lock(mutex_);
+    woken_ = true;
+    changed_.notify_one();
+}
+
+FrameQueue::Losses FrameQueue::LostFrames() const {
+    const std::lock_guard lock(mutex_);
+    return losses_;
+}
+
+}  // namespace lookhaven::recorder

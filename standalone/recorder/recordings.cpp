@@ -1,0 +1,169 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/recordings.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/upkeep/marks.h"
+#include "standalone/upkeep/mount_folder.h"
+#include "standalone/upkeep/recovery.h"
+#include "standalone/upkeep/retention.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+constexpr std::int64_t kRetentionUs = 10'000'000;
+
+// A mount that nothing was recorded to yet gets its mark; one that events are on and that lacks it is not there.
+void MarkNewMounts(store::Store& store) {
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        if (mount.enabled && upkeep::MountFolder::IsUnmarked(mount.path) &&
+            store::Events(store).Content(mount.id).events == 0) {
+            upkeep::MountFolder::Mark(mount.path, mount.id);
+        }
+    }
+}
+
+}  // namespace
+
+Recordings::Recordings(const base::Installation& installation, std::chrono::milliseconds no_data_limit)
+    : installation_(installation),
+      no_data_limit_(no_data_limit),
+      flush_requests_(installation),
+      ledger_(installation.StoreUrl()),
+      caretaker_(installation.StoreUrl(), "look after the recordings",
+                 [this](store::Store& store, const std::stop_token&) { Care(store); }) {}
+
+// Cameras whose plan is "never" and which a mark wants footage of now, and until when.
+std::map<int, std::int64_t> Recordings::MarkedCameras(const CatalogContents& catalog) const {
+    std::map<int, std::int64_t> until_s;
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    for (const store::Mark& mark : ledger_.PendingMarks()) {
+        if (catalog.cameras.contains(mark.camera_id) && mark.start_s <= now_s && now_s < mark.end_s) {
+            until_s[mark.camera_id] = std::max(until_s[mark.camera_id], mark.end_s);
+        }
+    }
+    return until_s;
+}
+
+void Recordings::Reconcile(const CatalogContents& catalog) {
+    const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
+    std::erase_if(entries_, [](const auto& entry) { return entry.second.ends && entry.second.worker->HasEnded(); });
+    const auto needs = [&](int camera, const CameraPlan& plan) {
+        return plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera);
+    };
+    for (auto& [camera, entry] : entries_) {
+        const auto plan = catalog.cameras.find(camera);
+        if (!entry.ends && (plan == catalog.cameras.end() || !needs(camera, plan->second))) {
+            entry.ends = true;
+            entry.worker->RequestStop();
+        }
+    }
+    for (const auto& [camera, plan] : catalog.cameras) {
+        if (!needs(camera, plan)) {
+            continue;
+        }
+        Entry& entry = entries_[camera];
+        if (entry.ends) {
+            continue;  // begins anew once it has ended
+        }
+        if (!entry.worker) {
+            const RecordingSurroundings surroundings{ledger_, base::MonotonicMicros, base::WallMillis,
+                                                     [this] { room_wanted_ = true; },
+                                                     std::chrono::microseconds(no_data_limit_).count()};
+            entry.worker = std::make_unique<RecordingWorker>(camera, surroundings, flush_requests_);
+        }
+        entry.stream = {camera, plan.stream};
+        entry.worker->SetOrder({plan, marked.contains(camera) ? marked.at(camera) : 0});
+    }
+    AnswerFlushes();
+}
+
+void Recordings::AnswerFlushes() {
+    for (const std::int32_t event : flush_requests_.Pending()) {
+        const auto open = std::ranges::find_if(
+            entries_, [&](const auto& entry) { return entry.second.worker->OpenEvent() == event; });
+        if (open == entries_.end()) {
+            flush_requests_.Answer(event, false);
+        } else {
+            open->second.worker->Flush(event);
+        }
+    }
+}
+
+void Recordings::DoEverySecond() {
+    ledger_.Refresh(entries_.size());
+    caretaker_.Ask();
+    std::vector<upkeep::CameraRecordingState> states;
+    for (const auto& [camera, entry] : entries_) {
+        states.push_back(entry.worker->State());
+    }
+    try {
+        if (states != published_) {
+            upkeep::WriteRecordingStates(installation_, states);
+            published_ = std::move(states);
+        }
+    } catch (const std::exception& failure) {
+        base::LogWarning(failure.what());
+    }
+}
+
+std::vector<ring::LiveStream> Recordings::Wanted() const {
+    std::vector<ring::LiveStream> streams;
+    for (const auto& [camera, entry] : entries_) {
+        if (!entry.ends) {
+            streams.push_back(entry.stream);
+        }
+    }
+    return streams;
+}
+
+std::shared_ptr<FrameQueue> Recordings::QueueOf(ring::LiveStream stream) const {
+    const auto entry = entries_.find(stream.camera);
+    return entry != entries_.end() && !entry->second.ends && entry->second.stream == stream
+               ? entry->second.worker->Queue()
+               : nullptr;
+}
+
+void Recordings::RequestStop() {
+    caretaker_.RequestStop();
+    for (auto& [camera, entry] : entries_) {
+        entry.ends = true;
+        entry.worker->RequestStop();
+    }
+}
+
+bool Recordings::HasEnded() {
+    if (!std::ranges::all_of(entries_, [](const auto& entry) { return entry.second.worker->HasEnded(); })) {
+        return false;
+    }
+    if (!std::exchange(stores_last_rows_, true)) {
+        ledger_.RequestStop();
+    }
+    return ledger_.HasEnded() && caretaker_.HasEnded();
+}
+
+void Recordings::Care(store::Store& store) {
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    MarkNewMounts(store);
+    if (const std::optional<int> first = ledger_.FirstOwnId(); first && !std::exchange(recovered_, true)) {
+        upkeep::Recover(store, *first, now_s);
+    }
+    upkeep::CompleteMarks(store, now_s);
+    const std::int64_t now_us = base::MonotonicMicros();
+    if (!room_wanted_.exchange(false) && now_us < next_retention_us_) {
+        return;
+    }
+    next_retention_us_ = now_us + kRetentionUs;
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        if (const upkeep::Removed removed = upkeep::Retain(store, mount, now_s); removed.events > 0) {
+            base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(removed.events) +
+                          " old events");
+        }
+    }
+}
+
+}  // namespace lookhaven::recorder

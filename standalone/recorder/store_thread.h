@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A thread with a connection to the store, for work that nobody may wait for.
+//
+// Why so        The store may be away or hang for as long as it likes; live streams and recordings go on meanwhile.
+// Thread safety Ask, RequestStop and HasEnded from any thread; the work runs in the thread alone.
+#pragma once
+
+#include <atomic>
+#include <condition_variable>
+#include <functional>
+#include <mutex>
+#include <optional>
+#include <stop_token>
+#include <string>
+#include <thread>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::recorder {
+
+class StoreThread {
+  public:
+    using Work = std::function<void(store::Store& store, const std::stop_token& stop)>;
+
+    // Starts the thread, which takes no signals and does the work once. When the work or the opening of the store throws,
+    // "cannot <purpose>" is logged once for each reason, and the store is opened anew the next time. Throws
+    // std::system_error when there is no thread to be had.
+    StoreThread(std::string store_url, std::string purpose, Work work);
+
+    // Does the work once more, or for the first time, soon; does not wait.
+    void Ask();
+
+    // Does what was asked for to the end once more and leaves; does not wait for that.
+    void RequestStop() { thread_.request_stop(); }
+    // Once true, destruction does not wait.
+    bool HasEnded() const { return has_ended_; }
+
+  private:
+    void Run(const std::stop_token& stop);
+    void TryToWork(const std::stop_token& stop) noexcept;
+
+    const std::string store_url_;
+    const std::string purpose_;
+    const Work work_;
+
+    // The thread's alone.
+    std::optional<store::Store> store_;
+    std::string reported_failure_;
+
+    std::mutex mutex_;
+    std::condition_variable_any asked_;
+    bool is_asked_ = true;
+    std::atomic<bool> has_ended_ = false;
+    std::jthread thread_;  // last: it uses the others
+};
+
+}  // namespace lookhaven::recorder
