@@ -9,10 +9,13 @@
 //           sharing of few connections (stream_budget, turns). Of a compressed stream, media_part tells the pieces apart;
 //           video_player decodes the picture (annexb, frame_gate), sound the sound (speaker_worklet with its
 //           jitter_buffer), and av_clock keeps them in step. An obstacle is why that cannot be done here.
-//   ui/     what is on the screen: login; wall with grid and tiles; large_view; snapshot_dialog. A picture is one
-//           camera's canvas with its messages. The address says which camera is large (route).
+//   playback/  how the past is played: history and days keep what the server told of it (coverage sorts it); a player plays
+//           one recording (frame_stream reads its frames, frame_clock knows their times), a deck several cameras in step.
+//   ui/     what is on the screen: login; wall with grid and tiles, large_view, snapshot_dialog; events_screen with the
+//           stage of player_tiles and their transport, timeline (time_scale, timeline_drawing), calendar, event_filter and
+//           event_list. A picture is one camera's canvas with its messages. The address says what is open (route).
 //
-// ui knows live and wire, live knows wire. Nothing here writes markup from text (see dom), and the page needs neither
+// ui knows live, playback and wire; playback knows wire and of live what waits and takes turns; live knows wire. Nothing here writes markup from text (see dom), and the page needs neither
 // inline styles nor scripts, so that a content security policy of 'self' holds.
 
 import "./style/base.css";
@@ -20,37 +23,53 @@ import "./style/login.css";
 import "./style/wall.css";
 import "./style/large.css";
 import "./style/snapshot.css";
+import "./style/events.css";
+import "./style/timeline.css";
 import { element } from "./ui/dom";
+import { EventsScreen } from "./ui/events_screen";
 import { loginScreen } from "./ui/login";
 import { hideNotice } from "./ui/notice";
+import { openScreen, type Screen } from "./ui/route";
 import { Wall } from "./ui/wall";
 import { Server, ServerError, type Account } from "./wire/server";
 
 const app = document.querySelector<HTMLElement>("#app")!;
-let wall: Wall | null = null;
+/** What a logged-in user sees; null at the login. */
+let shown: { screen: Screen; view: Wall | EventsScreen } | null = null;
+let account: Account | null = null;
 
 const server = new Server(() => showLogin("Your session has ended. Please log in again."));
 
 function showLogin(hint: string): void {
-  // A wall closes many requests, each of which may bring the news once more.
-  if (wall === null && app.querySelector(".login")) return;
-  wall?.close();
-  wall = null;
+  // A screen closes many requests, each of which may bring the news once more.
+  if (shown === null && app.querySelector(".login")) return;
+  shown?.view.close();
+  shown = account = null;
   hideNotice();
-  app.replaceChildren(loginScreen(server, hint, showWallOf));
+  app.replaceChildren(loginScreen(server, hint, showScreenOf));
   app.querySelector("input")?.focus();
 }
 
-function showWallOf(account: Account): void {
-  wall = new Wall(server, account, () => showLogin(""));
-  app.replaceChildren(wall.root);
+function showScreenOf(user: Account): void {
+  account = user;
+  followRoute();
+}
+
+function followRoute(): void {
+  const screen = openScreen();
+  if (!account || shown?.screen === screen) return;
+  shown?.view.close();
+  const Made = screen === "live" ? Wall : EventsScreen;
+  shown = { screen, view: new Made(server, account, () => showLogin("")) };
+  app.replaceChildren(shown.view.root);
 }
 
 async function start(): Promise<void> {
   app.replaceChildren(element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" }));
+  addEventListener("popstate", followRoute);
   try {
-    const account = await server.status();
-    if (account) showWallOf(account);
+    const user = await server.status();
+    if (user) showScreenOf(user);
     else showLogin("");
   } catch (error) {
     showLogin(error instanceof ServerError ? error.message : String(error));

@@ -8,6 +8,8 @@ import { createServer, type IncomingMessage, type ServerResponse } from "node:ht
 import type { AddressInfo } from "node:net";
 import { tmpdir } from "node:os";
 import { extname, join } from "node:path";
+import { Readable } from "node:stream";
+import { FakeArchive } from "./fake_archive";
 
 const kPolicy =
   "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
@@ -35,6 +37,7 @@ export class FakeServer {
   jpeg = Buffer.alloc(0);
   /** What cameras of another video type send, 25 pictures a second, over and over, with a tone beside each `isLoud`. */
   readonly muxed = new Map<number, { type: string; pictures: Buffer[]; isLoud(picture: number): boolean }>();
+  readonly archive = new FakeArchive();
   readonly #files = mkdtempSync(join(tmpdir(), "lookhaven-client-"));
   readonly #server = createServer((request, answer) => this.#answer(request, answer));
   #pollsNow = 0;
@@ -66,8 +69,11 @@ export class FakeServer {
     if (method === "Login") this.hasSession = true;
     if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
     if (method === "Logout") this.hasSession = false;
-    if (method === "Get") return this.#snapshot(answer);
+    if (method === "Get" && searchParams.get("api") === "VEXO.Picture") return this.#snapshot(answer);
     if (method === "Play") return this.#play(searchParams, answer);
+    if (/VEXO\.(Playback|Event|Catalog)|Player$/.test(searchParams.get("api")!) && method !== "LoadCamera") {
+      return void this.#recordings(searchParams, request, answer);
+    }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
     const list = {
       camera,
@@ -79,8 +85,25 @@ export class FakeServer {
     };
     json(answer, 200, {
       success: true,
-      data: method === "LoadCamera" ? list : { account: "admin", user_id: 1, is_manager: true },
+      data:
+        method === "LoadCamera"
+          ? list
+          : { account: "admin", user_id: 1, is_manager: true, players_per_session: this.archive.playersPerSession },
     });
+  }
+
+  async #recordings(query: URLSearchParams, request: IncomingMessage, answer: ServerResponse): Promise<void> {
+    let form = "";
+    for await (const piece of request) form += String(piece);
+    for (const [name, value] of new URLSearchParams(form)) query.set(name, value);
+    const left = new AbortController();
+    answer.on("close", () => left.abort());
+    const given = this.archive.answer(query, left.signal) ?? new Response(null, { status: 404 });
+    answer.writeHead(given.status, Object.fromEntries(given.headers));
+    if (!given.body) return void answer.end();
+    Readable.fromWeb(given.body as never)
+      .on("error", () => answer.destroy())
+      .pipe(answer);
   }
 
   #file(path: string, answer: ServerResponse): void {

@@ -18,6 +18,32 @@ export function calendarDate(unixMs: number): string {
   return [time.getFullYear(), time.getMonth() + 1, time.getDate()].map(two).join("-");
 }
 
+const kDayAndMonth = new Intl.DateTimeFormat("en-GB", { weekday: "short", day: "numeric", month: "short" });
+const kMonthAndYear = new Intl.DateTimeFormat("en-GB", { month: "long", year: "numeric" });
+
+/** "Tue 24 Nov" in the browser's time zone. */
+export function shortDate(unixMs: number): string {
+  return kDayAndMonth.format(unixMs).replace(",", "");
+}
+
+/** "November 2026". */
+export function monthName(unixMs: number): string {
+  return kMonthAndYear.format(unixMs);
+}
+
+/** "4:05", "1:00:00". */
+export function duration(seconds: number): string {
+  const [hours, rest] = [Math.floor(seconds / 3600), Math.floor(seconds) % 3600];
+  const minutes = Math.floor(rest / 60);
+  return `${hours > 0 ? `${hours}:${two(minutes)}` : minutes}:${two(rest % 60)}`;
+}
+
+/** "½×" for slow motion by two, "4×" for four times as fast. */
+export function rateText(rate: number): string {
+  const slow: Record<number, string> = { [-2]: "½", [-4]: "¼", [-8]: "⅛" };
+  return `${slow[rate] ?? rate}×`;
+}
+
 /** A file name that every file system takes: the camera's name and the time, without characters that some refuse. */
 export function snapshotFileName(cameraName: string, takenMs: number): string {
   const plain = cameraName

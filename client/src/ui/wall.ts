@@ -7,12 +7,14 @@ import { kVideoTypeMjpeg, ServerError, type Account, type Camera, type CameraLis
 import { adviceOn } from "./advice";
 import { iconButton } from "./button";
 import { element, setText } from "./dom";
+import { toggleFullScreen } from "./full_screen";
 import { Grid } from "./grid";
 import { icon, type IconName } from "./icons";
 import { LargeView, type LargeViewActions } from "./large_view";
 import { kLayoutChoices, type LayoutChoice } from "./layout";
-import { notify } from "./notice";
+import { navigation } from "./nav";
 import { openCamera, showCamera, showWall } from "./route";
+import { logoutButton } from "./session_end";
 import { SnapshotDialog } from "./snapshot_dialog";
 import { clockTime } from "./text";
 
@@ -89,9 +91,11 @@ export class Wall {
   }
 
   #bar(account: Account): HTMLElement {
-    const logout = iconButton("logout", `Log out ${account.account}`, () => void this.#logout());
+    const busy = (isBusy: boolean) => (this.#progress.hidden = !isBusy);
+    const logout = logoutButton(this.#server, account, this.#onLogout, busy);
     const brand = element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven"));
-    return element("header", { class: "bar" }, brand, this.#count, this.#layoutPicker(), this.#clock, logout);
+    const nav = navigation("live");
+    return element("header", { class: "bar" }, brand, nav, this.#count, this.#layoutPicker(), this.#clock, logout);
   }
 
   #layoutPicker(): HTMLElement {
@@ -214,25 +218,4 @@ export class Wall {
     else return;
     event.preventDefault();
   }
-
-  async #logout(): Promise<void> {
-    this.#progress.hidden = false;
-    try {
-      await this.#server.logout();
-      this.#onLogout();
-    } catch (error) {
-      this.#progress.hidden = true;
-      if (error instanceof ServerError && error.status === 401) return;
-      notify(`You are still logged in: ${error instanceof ServerError ? error.message : String(error)}`);
-    }
-  }
-}
-
-/** The whole page goes full screen, so that the user can go from camera to camera there. */
-function toggleFullScreen(): void {
-  // Refused where the browser has none: then nothing changes.
-  const change = document.fullscreenElement
-    ? document.exitFullscreen()
-    : document.documentElement.requestFullscreen?.();
-  change?.catch(() => undefined);
 }

@@ -8,6 +8,8 @@ export interface Account {
   account: string;
   user_id: number;
   is_manager: boolean;
+  /** How many recordings one session may play side by side; 1 where the server does not say. */
+  players_per_session?: number;
 }
 
 export interface Camera {
@@ -96,7 +98,7 @@ export class Server {
   /** The account of the running session, or null without one. */
   async status(): Promise<Account | null> {
     try {
-      return await this.#call<Account>("VEXO.Auth", "Status", {}, { quiet: true });
+      return await this.call<Account>("VEXO.Auth", "Status", {}, { quiet: true });
     } catch (error) {
       if (error instanceof ServerError && error.status === 401) return null;
       throw error;
@@ -105,7 +107,7 @@ export class Server {
 
   async login(account: string, password: string): Promise<Account> {
     try {
-      return await this.#call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true });
+      return await this.call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true });
     } catch (error) {
       if (error instanceof ServerError && error.status === 401) {
         throw new ServerError(401, error.code, "The account or the password is wrong.");
@@ -115,11 +117,11 @@ export class Server {
   }
 
   async logout(): Promise<void> {
-    await this.#call<unknown>("VEXO.Auth", "Logout", {}, { form: {} });
+    await this.call<unknown>("VEXO.Auth", "Logout", {}, { form: {} });
   }
 
   async cameras(): Promise<CameraList> {
-    return this.#call<CameraList>("VEXO.Lookhaven.Player", "LoadCamera", {});
+    return this.call<CameraList>("VEXO.Lookhaven.Player", "LoadCamera", {});
   }
 
   /** One picture in the camera's usual size. */
@@ -130,8 +132,8 @@ export class Server {
       // What the camera sends is a picture already, or has to be made into one by the host.
       const answer =
         camera.video_type === kVideoTypeMjpeg
-          ? await this.#media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", { ...parameters, snapshot: "1" }, deadline)
-          : await this.#media("VEXO.Picture", "Get", parameters, deadline);
+          ? await this.media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", { ...parameters, snapshot: "1" }, deadline)
+          : await this.media("VEXO.Picture", "Get", parameters, deadline);
       const captured = Number(answer.headers.get("X-Capture-Time"));
       return { jpeg: await answer.blob(), takenMs: captured > 0 ? captured * 1000 : Date.now() };
     } catch (error) {
@@ -147,13 +149,13 @@ export class Server {
   async live(cameraId: number, profile: number | null, signal: AbortSignal): Promise<Response> {
     const parameters: Record<string, string> = { camera: String(cameraId) };
     if (profile !== null) parameters["profileType"] = String(profile);
-    return this.#media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters, { signal }).catch((error: unknown) => {
+    return this.media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters, { signal }).catch((error: unknown) => {
       throw asServerError(error);
     });
   }
 
   /** An answer of pictures; a JSON answer in their place, whatever its status, is a failure. */
-  async #media(
+  async media(
     api: string,
     method: string,
     parameters: Record<string, string>,
@@ -167,7 +169,8 @@ export class Server {
     throw failure.status === 502 ? new ServerError(502, failure.code, "No picture came.") : failure;
   }
 
-  async #call<Data>(
+  /** The data of an answer. With `form` the request is a POST. A session that has ended is told unless `quiet`. */
+  async call<Data>(
     api: string,
     method: string,
     parameters: Record<string, string>,
@@ -192,11 +195,12 @@ export class Server {
   }
 }
 
-function address(api: string, method: string, parameters: Record<string, string>): string {
+/** Relative, so that the client works below any path. */
+export function address(api: string, method: string, parameters: Record<string, string>): string {
   return `webapi?${new URLSearchParams({ api, version: "1", method, ...parameters })}`;
 }
 
-function asServerError(error: unknown): ServerError {
+export function asServerError(error: unknown): ServerError {
   if (error instanceof ServerError) return error;
   // fetch speaks of a lost connection as TypeError, of our deadline as AbortError; JSON that is none is a SyntaxError.
   if (error instanceof SyntaxError) return new ServerError(502, 0, "The server's answer makes no sense.");

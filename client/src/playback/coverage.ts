@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What of a span was recorded, as segments that a timeline draws; and why, as the user tells kinds apart.
+
+import type { Footage, FootageKind, Runs } from "../wire/recordings";
+
+export interface Segment {
+  startS: number;
+  stopS: number;
+  /** Not only recorded, but kept as an event. */
+  isEvent: boolean;
+}
+
+/** Runs of steps from `fromS` on, cut at `toS`, without those of nothing. */
+export function segmentsOf(fromS: number, toS: number, interval: number, runs: Runs): Segment[] {
+  const segments: Segment[] = [];
+  let startS = fromS;
+  for (const [value, count] of runs) {
+    const stopS = Math.min(startS + Math.max(0, count) * interval, toS);
+    if (value > 0 && stopS > startS) segments.push({ startS, stopS, isEvent: value >= 2 });
+    startS = stopS;
+  }
+  return segments;
+}
+
+/** What the user filters by. */
+export type EventKind = "continuous" | "alarm" | Exclude<FootageKind, "event">;
+
+export const kEventKinds: readonly EventKind[] = ["continuous", "alarm", "alert", "pos"];
+
+const kReasonContinuous = 1;
+
+export function kindOf({ kind, reason }: Pick<Footage, "kind" | "reason">): EventKind {
+  if (kind !== "event") return kind;
+  return reason === kReasonContinuous ? "continuous" : "alarm";
+}
+
+/** The first of the footage, in order of start, that ends after the time. */
+export function firstEndingAfter(footage: readonly Footage[], timeS: number): number {
+  // Starts ascend and spans of one camera hardly overlap, so ends ascend as well.
+  let [low, high] = [0, footage.length];
+  while (low < high) {
+    const middle = (low + high) >> 1;
+    if (footage[middle]!.stop > timeS) high = middle;
+    else low = middle + 1;
+  }
+  return low;
+}

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which frame of a recording belongs to which time, as well as can be known without asking.
+//
+// Why so        A stream names its frames by index, the timeline knows times. A list gives a recording's first and last
+//               second and its number of frames; a camera whose rate varies strays from the line between. Each frame that
+//               was fetched by its time is exact, so the line is bent through it.
+
+interface Anchor {
+  index: number;
+  ms: number;
+}
+
+const kMostAnchors = 64;
+/** Where nothing is known of the number of frames. */
+const kGuessedPerSecond = 10;
+
+export class FrameClock {
+  #end: Anchor;
+  /** By index and by time at once, without the end. */
+  #anchors: Anchor[] = [{ index: 0, ms: 0 }];
+
+  constructor(frameCount: number, durationMs: number) {
+    this.#end = endOf(frameCount, durationMs);
+  }
+
+  /** A recording that grows has a later end. */
+  extend(frameCount: number, durationMs: number): void {
+    this.#end = endOf(frameCount, durationMs);
+  }
+
+  /** This frame is of this time. */
+  learn(index: number, ms: number): void {
+    const before = this.#anchors.filter((anchor) => anchor.index < index && anchor.ms < ms);
+    const after = this.#anchors.filter((anchor) => anchor.index > index && anchor.ms > ms);
+    this.#anchors = [...before, { index, ms }, ...after].slice(-kMostAnchors);
+  }
+
+  msOf(index: number): number {
+    const [from, to] = this.#around((anchor) => anchor.index <= index);
+    return from.ms + ((index - from.index) * (to.ms - from.ms)) / (to.index - from.index);
+  }
+
+  /** The last frame at or before the time. */
+  indexOf(ms: number): number {
+    const [from, to] = this.#around((anchor) => anchor.ms <= ms);
+    const index = from.index + ((ms - from.ms) * (to.index - from.index)) / (to.ms - from.ms);
+    // A time that came from an index leads back to it, whatever the division left behind the point.
+    return Math.max(0, Math.floor(index + 1e-6));
+  }
+
+  #around(isBefore: (anchor: Anchor) => boolean): [Anchor, Anchor] {
+    const at = Math.max(0, this.#anchors.findLastIndex(isBefore));
+    const from = this.#anchors[at]!;
+    const next = this.#anchors[at + 1] ?? this.#end;
+    if (next.index > from.index && next.ms > from.ms) return [from, next];
+    // Past the end, as fast as on the whole.
+    return [from, { index: from.index + this.#end.index, ms: from.ms + this.#end.ms }];
+  }
+}
+
+function endOf(frameCount: number, durationMs: number): Anchor {
+  const ms = Math.max(durationMs, 1000);
+  return { index: frameCount > 0 ? frameCount : (ms / 1000) * kGuessedPerSecond, ms };
+}

@@ -1,0 +1,60 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Reads a recording's frames out of the stream that plays it: a part with the index, then one with the picture.
+//
+// Why so        The next frames are read only when the last was taken. So a slow screen holds the server back through the
+//               connection, and the frame that is shown is the one that is named.
+
+import { Deadline } from "../wire/deadline";
+import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
+import { ServerError } from "../wire/server";
+
+export interface RecordedFrame {
+  index: number;
+  jpeg: Blob;
+}
+
+/** More than the longest pause the server makes between two frames of the slowest motion. */
+const kSilenceLimitMs = 25_000;
+
+/**
+ * Opens a stream and hands its frames to `take` until that returns false, the stream ends (both resolve) or fails
+ * (rejects with a ServerError). Ends at once when `owner` is aborted.
+ */
+export async function readFrames(
+  open: (signal: AbortSignal) => Promise<Response>,
+  take: (frame: RecordedFrame) => Promise<boolean>,
+  owner: AbortSignal,
+): Promise<void> {
+  const deadline = new Deadline(kSilenceLimitMs, owner);
+  try {
+    const answer = await open(deadline.signal);
+    const boundary = boundaryOf(answer.headers.get("Content-Type"));
+    if (!answer.body || boundary === null) throw new ServerError(502, 0, "The server sent no pictures.");
+    const parts: Part[] = [];
+    const parser = new MultipartParser(boundary, (part) => parts.push(part));
+    const reader = answer.body.getReader();
+    let index = -1;
+    for (let read = await reader.read(); !read.done; read = await reader.read()) {
+      deadline.extend();
+      parser.push(read.value);
+      for (const part of parts.splice(0)) {
+        if (owner.aborted) return;
+        if (!/^image\//.test(part.headers.get("content-type") ?? "")) index = indexOf(part, index);
+        else if (!(await take({ index, jpeg: new Blob([part.body], { type: "image/jpeg" }) }))) return;
+      }
+    }
+  } catch (error) {
+    if (owner.aborted) return;
+    if (error instanceof ServerError) throw error;
+    if (error instanceof MultipartError) throw new ServerError(502, 0, "The stream is damaged.");
+    throw new ServerError(0, 0, "The connection was lost.");
+  } finally {
+    deadline.release();
+  }
+}
+
+function indexOf(part: Part, before: number): number {
+  const index = parseInt(new TextDecoder().decode(part.body), 10);
+  return Number.isNaN(index) ? before : index;
+}

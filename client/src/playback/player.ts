@@ -1,0 +1,286 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Plays one recording after another in one place on the screen: play, pause, step, seek, rate.
+//
+// Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream, and
+//               everything that moves opens another. While the picture stands still there is no connection at all. A held
+//               key or a dragged playhead asks for more frames than can be fetched: of those only the last is.
+//
+//               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
+//               recording that still grows goes on as it grows, and ends with it.
+
+import { pause as wait } from "../live/source";
+import { newStreamKey, type Footage, type Recordings, type Start } from "../wire/recordings";
+import { ServerError } from "../wire/server";
+import { FrameClock } from "./frame_clock";
+import { readFrames, type RecordedFrame } from "./frame_stream";
+
+export type PlayerState =
+  /** There is nothing to play. */
+  | { kind: "empty" }
+  | { kind: "opening" | "playing" | "paused" | "ended" }
+  /** Another player of this session has taken over. */
+  | { kind: "pushedOut" }
+  | { kind: "failed"; reason: string };
+
+/** Slow motion by that factor below 0; above, that many frames at a time. */
+export const kRates = [-8, -4, -2, 1, 2, 4, 8, 16] as const;
+
+const kTailPauseMs = 1_000;
+/** The last second of a list is not exact. */
+const kExactUntilMs = 1_000;
+const kCannotPlay = 200;
+
+export class Player {
+  /** Draws a frame; the next is fetched when it is done. */
+  show: (frame: RecordedFrame) => Promise<void> = async () => undefined;
+  readonly #recordings: Recordings;
+  readonly #changed: () => void;
+  #footage: Footage | null = null;
+  #clock = new FrameClock(0, 0);
+  #state: PlayerState = { kind: "empty" };
+  #index = 0;
+  #rate = 1;
+  #key = 0;
+  #run = new AbortController();
+  /** The frame to fetch next while the picture stands still, and what fetches it. */
+  #wanted: Start | null = null;
+  #fetching: AbortSignal | null = null;
+
+  /** `changed` is called with every frame and every other change. */
+  constructor(recordings: Recordings, changed: () => void) {
+    this.#recordings = recordings;
+    this.#changed = changed;
+  }
+
+  get footage(): Footage | null {
+    return this.#footage;
+  }
+
+  get state(): PlayerState {
+    return this.#state;
+  }
+
+  /** Of the frame on the screen. */
+  get index(): number {
+    return this.#index;
+  }
+
+  get rate(): number {
+    return this.#rate;
+  }
+
+  /** Unix milliseconds of the frame on the screen. */
+  get timeMs(): number {
+    return (this.#footage?.start ?? 0) * 1000 + this.#clock.msOf(this.#index);
+  }
+
+  /** Goes over to a recording, `sinceStartMs` after its beginning. */
+  open(footage: Footage, sinceStartMs: number, isPlaying: boolean): void {
+    const isSame = this.#footage?.kind === footage.kind && this.#footage.id === footage.id;
+    if (!isSame) this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
+    this.#take(footage);
+    const start = this.#startAt(sinceStartMs);
+    if (isPlaying) void this.#play(start);
+    else this.#showStill(start);
+  }
+
+  play(): void {
+    if (!this.#footage || this.#state.kind === "playing") return;
+    void this.#play({ index: this.#state.kind === "ended" ? 0 : this.#index });
+  }
+
+  pause(): void {
+    if (this.#state.kind !== "playing" && this.#state.kind !== "opening") return;
+    // Before the first frame there is nothing that could stand still yet.
+    if (this.#state.kind === "opening") return this.#showStill({ index: this.#index });
+    this.#begin();
+    this.#become({ kind: "paused" });
+  }
+
+  step(by: number): void {
+    if (!this.#footage) return;
+    const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.#index;
+    const last = this.#footage.isGrowing || !this.#footage.frameCount ? Infinity : this.#footage.frameCount - 1;
+    const index = Math.max(0, Math.min(from + by, last));
+    if (index !== this.#index || this.#state.kind !== "paused") this.#showStill({ index });
+  }
+
+  /** Follows a running stream; the picture shows no break where the server can do that. */
+  setRate(rate: number): void {
+    if (rate === this.#rate) return;
+    this.#rate = rate;
+    this.#changed();
+    if (this.#state.kind !== "playing") return;
+    const run = this.#run;
+    this.#recordings.setRate(this.#key, rate).catch(() => {
+      if (run === this.#run && this.#state.kind === "playing") void this.#play({ index: this.#index });
+    });
+  }
+
+  /** Ends the connection; nothing is shown any more. */
+  close(): void {
+    this.#begin();
+    this.#footage = null;
+    this.#become({ kind: "empty" });
+  }
+
+  #begin(): AbortSignal {
+    this.#run.abort();
+    this.#run = new AbortController();
+    this.#wanted = this.#fetching = null;
+    return this.#run.signal;
+  }
+
+  #become(state: PlayerState): void {
+    this.#state = state;
+    this.#changed();
+  }
+
+  #take(footage: Footage): void {
+    this.#footage = footage;
+    this.#clock.extend(footage.frameCount, durationMs(footage));
+  }
+
+  #startAt(ms: number): Start {
+    const footage = this.#footage!;
+    const timeMs = Math.round(Math.max(0, Math.min(ms, durationMs(footage))));
+    if (timeMs === 0) return { index: 0 };
+    // The server finds times in recordings only, not in marks.
+    return footage.kind === "event" ? { timeMs } : { index: this.#clock.indexOf(timeMs) };
+  }
+
+  #showStill(start: Start): void {
+    if (this.#fetching) this.#wanted = start;
+    else void this.#fetchStills(start);
+  }
+
+  async #fetchStills(first: Start): Promise<void> {
+    const signal = this.#begin();
+    this.#fetching = signal;
+    this.#become({ kind: "opening" });
+    for (let start: Start | null = first; start && !signal.aborted; ) {
+      if (!(await this.#fetch(start, signal)) || signal.aborted) return;
+      start = this.#wanted;
+      this.#wanted = null;
+    }
+    if (signal.aborted) return;
+    this.#fetching = null;
+    this.#become({ kind: "paused" });
+  }
+
+  /** Shows one frame; false when that failed, which has become the state. */
+  async #fetch(start: Start, signal: AbortSignal): Promise<boolean> {
+    const footage = this.#footage!;
+    let isShown = false;
+    const open = (until: AbortSignal) => this.#recordings.play(footage, start, "one", 1, newStreamKey(), until);
+    const take = async (frame: RecordedFrame) => {
+      await this.#showFrame(frame, signal);
+      isShown = true;
+      return false;
+    };
+    try {
+      await readFrames(open, take, signal);
+    } catch (error) {
+      if (!signal.aborted) await this.#fail(error as ServerError, signal);
+      return false;
+    }
+    if (isShown && "timeMs" in start && start.timeMs < durationMs(footage) - kExactUntilMs) {
+      this.#clock.learn(this.#index, start.timeMs);
+    }
+    if (!isShown && !signal.aborted) await this.#fail(new ServerError(0, 0, "The connection was lost."), signal);
+    return isShown;
+  }
+
+  async #play(start: Start): Promise<void> {
+    const signal = this.#begin();
+    this.#become({ kind: "opening" });
+    let next = start;
+    if ("timeMs" in start) {
+      if (!(await this.#fetch(start, signal)) || signal.aborted) return;
+      next = { index: this.#index };
+    }
+    for (let index = (next as { index: number }).index; !signal.aborted; index = this.#index) {
+      const failure = await this.#stream(index, signal).catch((error: ServerError) => error);
+      if (signal.aborted) return;
+      if (failure) return this.#fail(failure, signal);
+      if (this.#state.kind === "ended" || !(await this.#goesOn(signal))) return;
+    }
+  }
+
+  /** Plays from a frame on to the end of the stream. */
+  async #stream(from: number, signal: AbortSignal): Promise<void> {
+    const footage = this.#footage!;
+    const key = (this.#key = newStreamKey());
+    const rate = this.#rate;
+    const extent = footage.isGrowing ? "growing" : "all";
+    let before = -1;
+    await readFrames(
+      (until) => this.#recordings.play(footage, { index: from }, extent, rate, key, until),
+      async (frame) => {
+        if (frame.index === before && !footage.isGrowing) {
+          this.#become({ kind: "ended" });
+          return false;
+        }
+        // The rate may have been changed while the stream was being opened.
+        if (before < 0 && this.#rate !== rate) this.#recordings.setRate(key, this.#rate).catch(() => undefined);
+        before = frame.index;
+        this.#state = { kind: "playing" };
+        await this.#showFrame(frame, signal);
+        return !signal.aborted;
+      },
+      signal,
+    );
+  }
+
+  async #showFrame(frame: RecordedFrame, signal: AbortSignal): Promise<void> {
+    // A frame that cannot be decoded is left out, and counts as shown.
+    await this.show(frame).catch(() => undefined);
+    if (signal.aborted) return;
+    this.#index = frame.index;
+    this.#changed();
+  }
+
+  /** After a stream's end: whether there is more to play. Else the state says why not. */
+  async #goesOn(signal: AbortSignal): Promise<boolean> {
+    const wasGrowing = this.#footage!.isGrowing;
+    const wasPushedOut = await this.#recordings.wasPushedOut(this.#key).catch(() => false);
+    if (signal.aborted) return false;
+    if (wasPushedOut) {
+      this.#become({ kind: "pushedOut" });
+      return false;
+    }
+    const footage = await this.#recordings.refresh(this.#footage!).catch(() => this.#footage);
+    if (signal.aborted) return false;
+    if (!footage) await this.#fail(new ServerError(404, 0, ""), signal);
+    if (!footage) return false;
+    this.#take(footage);
+    if (footage.isGrowing) {
+      // At the end of what there is, no rate is faster than the camera.
+      if (this.#rate > 1) this.#rate = 1;
+      await wait(kTailPauseMs, signal);
+      return !signal.aborted;
+    }
+    const isAtEnd = this.#index + Math.max(1, this.#rate) >= footage.frameCount;
+    if (isAtEnd) this.#become({ kind: "ended" });
+    else if (!wasGrowing) await this.#fail(new ServerError(0, 0, "The connection was lost."), signal);
+    return !isAtEnd && wasGrowing;
+  }
+
+  /** A recording that retention took away is told from one that cannot be played. */
+  async #fail(error: ServerError, signal: AbortSignal): Promise<void> {
+    let reason = error.message;
+    if (error.status === kCannotPlay || error.status === 404) {
+      const footage = await this.#recordings.refresh(this.#footage!).catch(() => this.#footage);
+      if (signal.aborted) return;
+      if (!footage) reason = "The recording is gone.";
+      else if (error.status === 404) reason = "The recording cannot be played.";
+    }
+    this.#begin();
+    this.#become({ kind: "failed", reason });
+  }
+}
+
+function durationMs({ start, stop }: Footage): number {
+  return Math.max(0, stop - start) * 1000;
+}

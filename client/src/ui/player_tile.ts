@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One player on the stage: its picture, whose it is and of when, and what is the matter when there is no picture.
+
+import type { Player, PlayerState } from "../playback/player";
+import { draw, element, setText } from "./dom";
+import { icon } from "./icons";
+import { clockTime, shortDate } from "./text";
+
+/** What comes at once needs no spinner; the style waits so long, too. */
+export class PlayerTile {
+  readonly root: HTMLElement;
+  readonly #player: Player;
+  readonly #canvas = element("canvas", { role: "img" });
+  readonly #time = element("time", { class: "stage-time" });
+  readonly #sentence = element("p", { class: "message-sentence", role: "status" });
+  readonly #again = element("button", { type: "button", class: "button" });
+
+  /** `onAgain` is the user's wish to play what has stopped. */
+  constructor(name: string, player: Player, onAgain: () => void) {
+    this.#player = player;
+    player.show = async ({ jpeg }) => {
+      const image = await createImageBitmap(jpeg);
+      draw(this.#canvas, image);
+      image.close();
+      this.root.classList.add("has-picture");
+    };
+    this.#again.addEventListener("click", onAgain);
+    const message = element(
+      "div",
+      { class: "message" },
+      element("div", { class: "spinner" }),
+      icon("warning"),
+      this.#sentence,
+      this.#again,
+    );
+    const caption = element("p", { class: "stage-caption" }, element("span", {}, name), this.#time);
+    this.root = element("figure", { class: "picture stage-picture" }, this.#canvas, caption, message);
+    this.#canvas.setAttribute("aria-label", `Recording of ${name}`);
+    this.refresh(null);
+  }
+
+  /** `playheadMs` is the time of which there is nothing. */
+  refresh(playheadMs: number | null): void {
+    const { state, footage, timeMs } = this.#player;
+    this.root.dataset["state"] = state.kind;
+    // A picture of another time must not pass for this one.
+    if (state.kind === "empty") this.root.classList.remove("has-picture");
+    setText(this.#time, footage ? `${shortDate(timeMs)} ${clockTime(timeMs)}` : "");
+    setText(this.#sentence, sentenceFor(state, playheadMs));
+    const again = state.kind === "pushedOut" ? "Play here" : state.kind === "failed" ? "Try again" : "";
+    setText(this.#again, again);
+    this.#again.hidden = again === "";
+  }
+}
+
+function sentenceFor(state: PlayerState, playheadMs: number | null): string {
+  switch (state.kind) {
+    case "empty":
+      if (playheadMs === null) return "Choose an event, or a time on the timeline.";
+      return `Nothing recorded at ${clockTime(playheadMs)}.`;
+    case "failed":
+      return state.reason;
+    case "pushedOut":
+      return "Playing in another window. One session plays one recording at a time.";
+    default:
+      return "";
+  }
+}

@@ -1,0 +1,265 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What was recorded, as the web API tells it: events, coverage, days, marks; and the streams that play them.
+
+import { boundaryOf } from "./multipart";
+import { address, asServerError, ServerError, type Server } from "./server";
+
+/** Event: a recording on the disk. Alert and pos: a mark that somebody reported, with the recordings of its span. */
+export type FootageKind = "event" | "alert" | "pos";
+
+export interface FootageRef {
+  kind: FootageKind;
+  id: number;
+}
+
+/** Something that can be played. */
+export interface Footage extends FootageRef {
+  camera: number;
+  /** Unix seconds; `stop` of what still grows is as far as it can be played now. */
+  start: number;
+  stop: number;
+  /** When what a mark tells of happened; its footage begins before. */
+  moment: number;
+  /** 0 where the server does not say. */
+  frameCount: number;
+  isGrowing: boolean;
+  /** The server's number for why it was recorded; 0 for marks. */
+  reason: number;
+  /** What a mark says, else empty. */
+  text: string;
+  /** There is something to play. */
+  isSaved: boolean;
+}
+
+/** Value and number of steps: 0 nothing, 1 recorded, 2 an event. */
+export type Runs = [value: number, count: number][];
+
+export interface CameraHistory {
+  camera: number;
+  events: Footage[];
+  /** Null where the server has no recording log of the camera. */
+  coverage: { interval: number; runs: Runs } | null;
+}
+
+export interface Group {
+  id: number;
+  name: string;
+  cameras: number[];
+}
+
+/** Where a stream begins: at a frame, or (recorded events only) at the frame of a time since the recording's start. */
+export type Start = { index: number } | { timeMs: number };
+
+/** How far a stream goes: that one picture, all there is, or on and on with what is still being recorded. */
+export type Extent = "one" | "all" | "growing";
+
+interface RawEvent {
+  id: number;
+  start: number;
+  stop: number;
+  frame_count: number;
+  record_type: number;
+  is_recording: boolean;
+}
+
+interface RawMark {
+  id: number;
+  kind: "alert" | "pos";
+  camera_id: number;
+  time: number;
+  start: number;
+  stop: number;
+  /** Pending: the footage is not complete yet; missed: there is none. */
+  state: "pending" | "saved" | "missed";
+  text: string[];
+}
+
+interface RawHistory {
+  camera: {
+    camera_id: number;
+    event: RawEvent[] | null;
+    event_map?: { interval: number; runs: Runs };
+  }[];
+}
+
+const kPlayer = "VEXO.Lookhaven.Player";
+/** The numbers of the kinds on the wire. */
+const kKinds: Record<FootageKind, number> = { event: 0, alert: 1, pos: 2 };
+/** Beyond every frame of every recording, yet far from where the server's 32 bits end. */
+const kFarFrame = 1_000_000_000;
+/** The most the server lists at once. */
+const kMostMarks = 10_000;
+const kLargestKey = 2 ** 31 - 1;
+
+/** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
+export function newStreamKey(): number {
+  return 1 + (crypto.getRandomValues(new Uint32Array(1))[0]! % (kLargestKey - 1));
+}
+
+export class Recordings {
+  readonly #server: Server;
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  /** At most 31 days. `interval` is the step of the coverage in seconds. */
+  async history(fromS: number, toS: number, cameras: readonly number[], interval: number): Promise<CameraHistory[]> {
+    const answer = await this.#server.call<RawHistory>(kPlayer, "EnumEvent", {
+      from: String(fromS),
+      to: String(toS),
+      interval: String(interval),
+      recording: "true",
+      cameralists: cameras.join(),
+    });
+    return answer.camera.map(({ camera_id, event, event_map }) => ({
+      camera: camera_id,
+      events: (event ?? []).map((one) => footageOf(one, camera_id)),
+      coverage: event_map ?? null,
+    }));
+  }
+
+  /** For each of `count` days of 24 hours from `startS` on, whether one of the cameras has a recording. */
+  async days(startS: number, count: number, cameras: readonly number[]): Promise<boolean[]> {
+    const answer = await this.#server.call<{ available_day: number[] | null }>(kPlayer, "SearchAvaiDate", {
+      start: String(startS),
+      day_count: String(count),
+      cameralists: cameras.join(),
+    });
+    return (answer.available_day ?? []).map((day) => day === 1);
+  }
+
+  async marks(fromS: number, toS: number, cameras: readonly number[]): Promise<Footage[]> {
+    const answer = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", {
+      from: String(fromS),
+      to: String(toS),
+      limit: String(kMostMarks),
+      cameralists: cameras.join(),
+    });
+    return answer.event.map(markOf);
+  }
+
+  async groups(): Promise<Group[]> {
+    type RawGroup = { id: number; name: string; camera: number[] };
+    const answer = await this.#server.call<{ group: RawGroup[] }>("VEXO.Catalog", "Groups", {});
+    return answer.group.map(({ id, name, camera }) => ({ id, name, cameras: camera }));
+  }
+
+  /** The event or mark of an address; null when there is none, or none for this caller. */
+  async find({ kind, id }: FootageRef): Promise<Footage | null> {
+    const parameters = { event: String(id), ...kindParameter(kind) };
+    try {
+      if (kind !== "event") return markOf(await this.#server.call<RawMark>("VEXO.Event", "Get", parameters));
+      const found = await this.#server.call<RawEvent & { camera_id: number }>("VEXO.Event", "Get", parameters);
+      return footageOf(found, found.camera_id);
+    } catch (error) {
+      if (error instanceof ServerError && error.status === 404) return null;
+      throw error;
+    }
+  }
+
+  /** What the server knows of it now; null when it is gone. */
+  async refresh(footage: Footage): Promise<Footage | null> {
+    const { kind, id, camera, start } = footage;
+    const found =
+      kind === "event"
+        ? (await this.history(start, start + 1, [camera], 1)).flatMap(({ events }) => events)
+        : await this.marks(start, start + 1, [camera]);
+    return found.find((one) => one.kind === kind && one.id === id) ?? null;
+  }
+
+  /**
+   * Opens a stream of pictures, each behind a part with its frame's index. The caller reads the body and ends it with
+   * `signal`. Rejects with a ServerError; its status is 200 where the server shows a warning in place of the footage.
+   */
+  async play(
+    footage: Footage,
+    start: Start,
+    extent: Extent,
+    rate: number,
+    key: number,
+    signal: AbortSignal,
+  ): Promise<Response> {
+    const common = { mountid: "0", eventid: String(footage.id), playrate: String(rate), timestamp: String(key) };
+    const [method, rest] =
+      "timeMs" in start
+        ? // Sampled, since only then the frame's index comes with it.
+          [
+            "PlayMjpegEventNoFrameId",
+            { startTimeMS: String(start.timeMs), interval: "0", flushHeader: footage.isGrowing ? "1" : "0" },
+          ]
+        : [
+            "PlayMjpegEvent",
+            {
+              framestart: String(start.index),
+              framestop: String(extent === "one" ? start.index : extent === "all" ? -1 : kFarFrame),
+              recEvtType: String(kKinds[footage.kind]),
+            },
+          ];
+    try {
+      const answer = await this.#server.media(kPlayer, method, { ...common, ...rest }, { signal });
+      if (boundaryOf(answer.headers.get("Content-Type")) !== null) return answer;
+      void answer.body?.cancel();
+    } catch (error) {
+      throw asServerError(error);
+    }
+    throw new ServerError(200, 0, "The recording cannot be played.");
+  }
+
+  /** Rejects where no stream of this key runs. */
+  async setRate(key: number, rate: number): Promise<void> {
+    await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
+  }
+
+  /** Whether another player of this session has taken the place of the one with this key; rejects where nobody knows. */
+  async wasPushedOut(key: number): Promise<boolean> {
+    const answer = await this.#server.call<{ owner: boolean }>(
+      "VEXO.Playback",
+      "CheckOwner",
+      {},
+      { form: { timestamp: String(key) } },
+    );
+    return !answer.owner;
+  }
+
+  downloadAddress({ kind, id }: FootageRef): string {
+    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind) });
+  }
+}
+
+function footageOf(raw: RawEvent, camera: number): Footage {
+  return {
+    kind: "event",
+    id: raw.id,
+    camera,
+    start: raw.start,
+    stop: raw.stop,
+    moment: raw.start,
+    frameCount: raw.frame_count,
+    isGrowing: raw.is_recording,
+    reason: raw.record_type,
+    text: "",
+    isSaved: true,
+  };
+}
+
+function markOf({ id, kind, camera_id, start, stop, time, state, text }: RawMark): Footage {
+  const unknown = { frameCount: 0, isGrowing: false, reason: 0 };
+  return {
+    id,
+    kind,
+    camera: camera_id,
+    start,
+    stop,
+    moment: time,
+    text: text.join("\n"),
+    isSaved: state === "saved",
+    ...unknown,
+  };
+}
+
+/** The server takes no kind for a recorded event. */
+function kindParameter(kind: FootageKind): Record<string, string> {
+  return kind === "event" ? {} : { kind };
+}
