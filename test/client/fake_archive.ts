@@ -21,7 +21,7 @@ interface Stream {
   pushOut(): void;
 }
 
-const kTailMs = 50;
+const kTailMs = 2_000;
 const kBoundary = "frame";
 const json = (data: unknown, status = 200) =>
   new Response(JSON.stringify(status === 200 ? { success: true, data } : { success: false, error: { code: status } }), {
@@ -38,7 +38,6 @@ export class FakeArchive {
   framesPerSecond = 100;
   /** Frame `index` of a recording; without pictures a few bytes. */
   picture: (index: number, camera: number) => Uint8Array = () => Uint8Array.of(255, 216);
-  readonly #pushedOut = new Set<number>();
 
   readonly fetch = async (address: string, init: { signal?: AbortSignal; body?: unknown } = {}): Promise<Response> => {
     const query = new URLSearchParams(address.slice(address.indexOf("?")));
@@ -56,10 +55,6 @@ export class FakeArchive {
         return json({ search_time: number("start"), available_day: this.#days(query) });
       case "VEXO.Event List":
         return json({ event: idsOf(query).flatMap((camera) => this.#touching(camera, number("from"), number("to"), true).map(rawMark)) });
-      case "VEXO.Event Get": {
-        const found = this.recorded.find(({ id, kind = "event" }) => id === number("event") && kind === (query.get("kind") ?? "event"));
-        return found ? json(found.kind && found.kind !== "event" ? rawMark(found) : { ...rawEvent(found), camera_id: found.camera }) : json(null, 404);
-      }
       case "VEXO.Catalog Groups":
         return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
       case "VEXO.Playback SetRate": {
@@ -67,8 +62,6 @@ export class FakeArchive {
         if (stream) stream.rate = number("rate");
         return stream ? json(null) : json(null, 404);
       }
-      case "VEXO.Playback CheckOwner":
-        return json({ owner: !this.#pushedOut.has(number("timestamp")) });
       case "VEXO.Lookhaven.Player PlayMjpegEvent":
       case "VEXO.Lookhaven.Player PlayMjpegEventNoFrameId":
         return this.#play(query, signal);
@@ -135,11 +128,7 @@ export class FakeArchive {
           end();
           controller.close();
         };
-        const pushOut = () => {
-          this.#pushedOut.add(key);
-          close();
-        };
-        const stream: Stream = { key, rate, pushOut };
+        const stream: Stream = { key, rate, pushOut: close };
         const send = () => {
           // A browser that does not read holds the server back.
           if ((controller.desiredSize ?? 0) > -20) {

@@ -19,7 +19,7 @@ export type PlayerState =
   /** There is nothing to play. */
   | { kind: "empty" }
   | { kind: "opening" | "playing" | "paused" | "ended" }
-  /** Another player of this session has taken over. */
+  /** The server ended the stream before its end: another player of this session has taken over. */
   | { kind: "pushedOut" }
   | { kind: "failed"; reason: string };
 
@@ -27,6 +27,8 @@ export type PlayerState =
 export const kRates = [-8, -4, -2, 1, 2, 4, 8, 16] as const;
 
 const kTailPauseMs = 1_000;
+/** The server waits longer for what is still being recorded, and not at all when another player takes over. */
+const kTailSilenceMs = 1_500;
 /** The last second of a list is not exact. */
 const kExactUntilMs = 1_000;
 const kCannotPlay = 200;
@@ -42,8 +44,9 @@ export class Player {
   #index = 0;
   #rate = 1;
   #key = 0;
+  #lastFrameMs = 0;
   #run = new AbortController();
-  /** The frame to fetch next while the picture stands still, and what fetches it. */
+  /** The frame asked for last while the picture stands still, until it is shown; and what fetches it. */
   #wanted: Start | null = null;
   #fetching: AbortSignal | null = null;
 
@@ -151,21 +154,20 @@ export class Player {
   }
 
   #showStill(start: Start): void {
-    if (this.#fetching) this.#wanted = start;
-    else void this.#fetchStills(start);
+    if (!this.#fetching) return void this.#fetchStills(start);
+    this.#wanted = start;
   }
 
   async #fetchStills(first: Start): Promise<void> {
     const signal = this.#begin();
     this.#fetching = signal;
+    this.#wanted = first;
     this.#become({ kind: "opening" });
-    for (let start: Start | null = first; start && !signal.aborted; ) {
+    for (let start: Start | null = null; start !== this.#wanted; ) {
+      start = this.#wanted!;
       if (!(await this.#fetch(start, signal)) || signal.aborted) return;
-      start = this.#wanted;
-      this.#wanted = null;
     }
-    if (signal.aborted) return;
-    this.#fetching = null;
+    this.#wanted = this.#fetching = null;
     this.#become({ kind: "paused" });
   }
 
@@ -237,34 +239,34 @@ export class Player {
     // A frame that cannot be decoded is left out, and counts as shown.
     await this.show(frame).catch(() => undefined);
     if (signal.aborted) return;
+    this.#lastFrameMs = performance.now();
     this.#index = frame.index;
     this.#changed();
   }
 
-  /** After a stream's end: whether there is more to play. Else the state says why not. */
+  /**
+   * After the server has ended a stream: whether there is more to play. Else the state says why not. A player that was
+   * replaced is unknown to the server from then on, so that it is told by how the stream ended.
+   */
   async #goesOn(signal: AbortSignal): Promise<boolean> {
-    const wasGrowing = this.#footage!.isGrowing;
-    const wasPushedOut = await this.#recordings.wasPushedOut(this.#key).catch(() => false);
+    const before = this.#footage!;
+    const wasAtTail = before.isGrowing && performance.now() - this.#lastFrameMs >= kTailSilenceMs;
+    const footage = await this.#recordings.refresh(before).catch(() => before);
     if (signal.aborted) return false;
-    if (wasPushedOut) {
-      this.#become({ kind: "pushedOut" });
+    if (!footage) {
+      await this.#fail(new ServerError(404, 0, ""), signal);
       return false;
     }
-    const footage = await this.#recordings.refresh(this.#footage!).catch(() => this.#footage);
-    if (signal.aborted) return false;
-    if (!footage) await this.#fail(new ServerError(404, 0, ""), signal);
-    if (!footage) return false;
     this.#take(footage);
-    if (footage.isGrowing) {
-      // At the end of what there is, no rate is faster than the camera.
-      if (this.#rate > 1) this.#rate = 1;
-      await wait(kTailPauseMs, signal);
-      return !signal.aborted;
+    const isAtEnd = !footage.isGrowing && this.#index + Math.max(1, this.#rate) >= footage.frameCount;
+    if (!wasAtTail || isAtEnd) {
+      this.#become({ kind: wasAtTail ? "ended" : "pushedOut" });
+      return false;
     }
-    const isAtEnd = this.#index + Math.max(1, this.#rate) >= footage.frameCount;
-    if (isAtEnd) this.#become({ kind: "ended" });
-    else if (!wasGrowing) await this.#fail(new ServerError(0, 0, "The connection was lost."), signal);
-    return !isAtEnd && wasGrowing;
+    // At the end of what there is, no rate is faster than the camera.
+    if (footage.isGrowing && this.#rate > 1) this.#rate = 1;
+    if (footage.isGrowing) await wait(kTailPauseMs, signal);
+    return !signal.aborted;
   }
 
   /** A recording that retention took away is told from one that cannot be played. */

@@ -28,6 +28,7 @@ export class EventList {
   readonly #resized = new ResizeObserver(() => this.#render());
   #footage: readonly Footage[] = [];
   #selected: FootageRef | null = null;
+  #isSought = false;
   /** The row that the keys move. */
   #at = 0;
 
@@ -46,14 +47,15 @@ export class EventList {
     this.#footage = footage;
     setText(this.#head, head);
     setText(this.#note, note);
+    this.#seek();
     this.#render();
   }
 
   select(selected: FootageRef | null): void {
     if (selected?.id === this.#selected?.id && selected?.kind === this.#selected?.kind) return;
     this.#selected = selected;
-    const at = this.#footage.findIndex((one) => isSame(one, selected));
-    if (at >= 0) this.#reveal(at);
+    this.#isSought = true;
+    this.#seek();
     this.#render();
   }
 
@@ -63,6 +65,16 @@ export class EventList {
 
   get #rowPx(): number {
     return parseFloat(getComputedStyle(this.root).getPropertyValue("--row")) || 44;
+  }
+
+  /** Scrolls to what was selected last, once: as soon as it is listed. */
+  #seek(): void {
+    const at = this.#isSought ? this.#footage.findIndex((one) => isSame(one, this.#selected)) : -1;
+    if (at < 0) return;
+    this.#isSought = false;
+    // The rows that have come since make the room that is scrolled.
+    this.#space.style.height = `${this.#footage.length * this.#rowPx}px`;
+    this.#reveal(at);
   }
 
   #reveal(at: number): void {

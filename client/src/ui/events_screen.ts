@@ -19,7 +19,7 @@ import { icon } from "./icons";
 import { navigation } from "./nav";
 import { notify } from "./notice";
 import { PlayerTile } from "./player_tile";
-import { nameFootage, openFootage } from "./route";
+import { nameFootage, openFootage, placeOf } from "./route";
 import { logoutButton } from "./session_end";
 import { clockTime } from "./text";
 import { spanText } from "./time_scale";
@@ -159,10 +159,14 @@ export class EventsScreen {
   /** Shows what the address names, unless it is being shown. */
   async #followRoute(): Promise<void> {
     const wanted = openFootage();
-    if (!wanted || isSame(wanted, this.#deck.lead?.player.footage)) return;
+    // "Back" from what is being played ends it.
+    if (!wanted) return this.#deck.close();
+    if (isSame(wanted, this.#deck.lead?.player.footage)) return;
     const opening = (this.#opening = `${wanted.kind}${wanted.id}`);
     try {
-      const footage = await this.#recordings.find(wanted);
+      const place = placeOf(wanted);
+      const all = this.#cameras.map(({ id }) => id);
+      const footage = await (place ? this.#recordings.refresh(place) : this.#recordings.find(wanted, all));
       if (this.#opening !== opening) return;
       if (footage) this.#open(footage);
       else notify("There is no such recording any more, or it is not for you to see.");
@@ -224,7 +228,7 @@ export class EventsScreen {
   /** Asks for what the timeline shows now, but not while it is still being moved. */
   #moved(): void {
     const { startMs, endMs } = this.#timeline.scale;
-    this.#calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
+    if (this.#timeline.isFine) this.#calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
     clearTimeout(this.#settling);
     this.#settling = setTimeout(() => this.#askAnew(), kSettleMs);
     this.#showSoon();

@@ -7,7 +7,6 @@ import { draw, element, setText } from "./dom";
 import { icon } from "./icons";
 import { clockTime, shortDate } from "./text";
 
-/** What comes at once needs no spinner; the style waits so long, too. */
 export class PlayerTile {
   readonly root: HTMLElement;
   readonly #player: Player;
@@ -62,7 +61,7 @@ function sentenceFor(state: PlayerState, playheadMs: number | null): string {
     case "failed":
       return state.reason;
     case "pushedOut":
-      return "Playing in another window. One session plays one recording at a time.";
+      return "The server has stopped this player. Another window of this session is probably playing.";
     default:
       return "";
   }

@@ -40,6 +40,8 @@ const kKeyZoom = 1.6;
 const kStartSpanMs = 6 * 3_600_000;
 /** Of the span, kept free behind the playhead or the present. */
 const kAhead = 0.12;
+/** Of the span, how much may be still to come. */
+const kMostAhead = 0.3;
 
 export class Timeline {
   readonly root: HTMLElement;
@@ -167,10 +169,8 @@ export class Timeline {
 
   #show(scale: TimeScale): void {
     // Of the future there is nothing to see.
-    const latestMs = Date.now() + scale.spanMs * (1 - kAhead);
-    this.#scale = scale.startMs > Date.now() - scale.spanMs * kAhead
-      ? scale.panned((scale.endMs - latestMs) / scale.msPerPx)
-      : scale;
+    const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMostAhead);
+    this.#scale = beyondMs > 0 ? scale.panned(beyondMs / scale.msPerPx) : scale;
     this.#actions.moved();
     this.redraw();
   }

@@ -13,11 +13,16 @@ export interface FootageRef {
   id: number;
 }
 
-/** Something that can be played. */
-export interface Footage extends FootageRef {
+/** Enough to ask the server for it. */
+export interface FootagePlace extends FootageRef {
   camera: number;
-  /** Unix seconds; `stop` of what still grows is as far as it can be played now. */
+  /** Unix seconds. */
   start: number;
+}
+
+/** Something that can be played. */
+export interface Footage extends FootagePlace {
+  /** Of what still grows, as far as it can be played now. */
   stop: number;
   /** When what a mark tells of happened; its footage begins before. */
   moment: number;
@@ -90,6 +95,13 @@ const kKinds: Record<FootageKind, number> = { event: 0, alert: 1, pos: 2 };
 const kFarFrame = 1_000_000_000;
 /** The most the server lists at once. */
 const kMostMarks = 10_000;
+const kDayS = 86_400;
+const kSearchedDays = [
+  [1, 0],
+  [7, 1],
+  [19, 7],
+  [31, 19],
+] as const;
 const kLargestKey = 2 ** 31 - 1;
 
 /** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
@@ -146,22 +158,26 @@ export class Recordings {
     return answer.group.map(({ id, name, camera }) => ({ id, name, cameras: camera }));
   }
 
-  /** The event or mark of an address; null when there is none, or none for this caller. */
-  async find({ kind, id }: FootageRef): Promise<Footage | null> {
-    const parameters = { event: String(id), ...kindParameter(kind) };
-    try {
-      if (kind !== "event") return markOf(await this.#server.call<RawMark>("VEXO.Event", "Get", parameters));
-      const found = await this.#server.call<RawEvent & { camera_id: number }>("VEXO.Event", "Get", parameters);
-      return footageOf(found, found.camera_id);
-    } catch (error) {
-      if (error instanceof ServerError && error.status === 404) return null;
-      throw error;
+  /**
+   * The event or mark of an address among those of the cameras; null when there is none. The server lists by time, not
+   * by id: events are looked for in the last 31 days, the newest first, marks among the newest ten thousand.
+   */
+  async find({ kind, id }: FootageRef, cameras: readonly number[]): Promise<Footage | null> {
+    const nowS = Math.floor(Date.now() / 1000);
+    if (kind !== "event") {
+      return (await this.marks(0, nowS, cameras)).find((mark) => mark.kind === kind && mark.id === id) ?? null;
     }
+    for (const [fromDay, toDay] of kSearchedDays) {
+      const [fromS, toS] = [nowS - fromDay * kDayS, nowS - toDay * kDayS];
+      const found = (await this.history(fromS, toS, cameras, kDayS)).flatMap(({ events }) => events);
+      const event = found.find((one) => one.id === id);
+      if (event) return event;
+    }
+    return null;
   }
 
   /** What the server knows of it now; null when it is gone. */
-  async refresh(footage: Footage): Promise<Footage | null> {
-    const { kind, id, camera, start } = footage;
+  async refresh({ kind, id, camera, start }: FootagePlace): Promise<Footage | null> {
     const found =
       kind === "event"
         ? (await this.history(start, start + 1, [camera], 1)).flatMap(({ events }) => events)
@@ -210,17 +226,6 @@ export class Recordings {
   /** Rejects where no stream of this key runs. */
   async setRate(key: number, rate: number): Promise<void> {
     await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
-  }
-
-  /** Whether another player of this session has taken the place of the one with this key; rejects where nobody knows. */
-  async wasPushedOut(key: number): Promise<boolean> {
-    const answer = await this.#server.call<{ owner: boolean }>(
-      "VEXO.Playback",
-      "CheckOwner",
-      {},
-      { form: { timestamp: String(key) } },
-    );
-    return !answer.owner;
   }
 
   downloadAddress({ kind, id }: FootageRef): string {

@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The events' screen in a real browser: from the calendar to the picture of a time, and with keys from there.
+
+import { Browser, hasBrowser, type Page } from "./browser";
+import { FakeServer } from "./fake_server";
+
+const kFrames = 3_000;
+
+describe.skipIf(!hasBrowser)("in Chromium", () => {
+  const server = new FakeServer();
+  const { archive } = server;
+  let browser: Browser;
+  let address: string;
+  /** Two days ago at noon of the browser's zone: an hour of two cameras, in recordings of five minutes. */
+  const noon = Math.floor(new Date(Date.now() - 2 * 86_400_000).setHours(12, 0, 0, 0) / 1000);
+
+  beforeAll(async () => {
+    browser = new Browser();
+    address = await server.start();
+    const page = await browser.open(address, 100, 100);
+    // Of each frame the brightness tells the index.
+    const shades = await page.run(() => {
+      const canvas = Object.assign(document.createElement("canvas"), { width: 64, height: 36 });
+      const context = canvas.getContext("2d")!;
+      return Array.from({ length: 16 }, (_, shade) => {
+        context.fillStyle = `rgb(${shade * 16} ${shade * 16} ${shade * 16})`;
+        context.fillRect(0, 0, 64, 36);
+        return canvas.toDataURL("image/jpeg").split(",")[1]!;
+      });
+    });
+    const pictures = shades.map((shade) => Buffer.from(shade, "base64"));
+    server.jpeg = pictures[8]!;
+    archive.picture = (index) => pictures[index % 16]!;
+    archive.framesPerSecond = 10;
+    server.cameras.push({ id: 1, name: "Entrance <b>", video_type: 1 }, { id: 2, name: "Parking", video_type: 1 });
+    for (let piece = 0; piece < 12; piece += 1) {
+      const start = noon + piece * 300;
+      archive.recorded.push({ id: 10 + piece, camera: 1, start, stop: start + 300, frames: kFrames });
+      archive.recorded.push({ id: 40 + piece, camera: 2, start, stop: start + 300, frames: kFrames, reason: 3 });
+    }
+    archive.recorded.push({ id: 90, camera: 2, start: noon, stop: noon + 30, frames: 300, kind: "pos", text: "2 Tea <b>\nTotal 5" });
+    await page.send("Page.close", {});
+  }, 30_000);
+
+  afterAll(async () => {
+    await browser.close();
+    server.close();
+  });
+
+  async function opened(hash: string, widthPx: number, heightPx: number, players = 1): Promise<Page> {
+    archive.playersPerSession = players;
+    archive.asked.length = 0;
+    server.hasSession = true;
+    const page = await browser.open(`${address}${hash}`, widthPx, heightPx);
+    await page.until(() => document.querySelector(".events") !== null);
+    await page.run(() =>
+      addEventListener("securitypolicyviolation", (event) => (document.title += ` ${event.violatedDirective}`)),
+    );
+    return page;
+  }
+
+  const state = (page: Page, wanted: string) =>
+    page.until((kind) => document.querySelector<HTMLElement>(".stage-picture")!.dataset["state"] === kind, wanted);
+  /** The number that is told and the shade that is painted. */
+  const frame = (page: Page) =>
+    page.run(() => {
+      const told = Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame")!.textContent!)![1]) - 1;
+      const canvas = document.querySelector<HTMLCanvasElement>(".stage-picture canvas")!;
+      return { told, painted: Math.round(canvas.getContext("2d")!.getImageData(9, 9, 1, 1).data[0]! / 16) };
+    });
+
+  async function clickLane(page: Page, camera: number, atS: number): Promise<void> {
+    const box = await page.run(() => {
+      const { x, y, width, height } = document.querySelector(".timeline-lanes")!.getBoundingClientRect();
+      return { x, y, width, height };
+    });
+    // The calendar's day fills the timeline's width.
+    const x = box.x + (box.width * (atS - (noon - 43_200))) / 86_400;
+    const where = { x, y: box.y + (box.height * (camera - 0.5)) / 2, button: "left", clickCount: 1 };
+    for (const type of ["mousePressed", "mouseReleased"]) await page.send("Input.dispatchMouseEvent", { type, ...where });
+  }
+
+  test("calendar, timeline, picture of that time; pause, steps, rate and the way back", async () => {
+    const page = await opened("#events", 1440, 900);
+    const day = new Date(noon * 1000).setHours(0, 0, 0, 0);
+    await page.until((ms) => document.querySelector(`.day.has[data-day="${ms}"]`) !== null, day);
+    expect(await page.run(() => document.querySelectorAll(".day.has").length)).toBe(1);
+    await page.click(`.day[data-day="${day}"]`);
+    await page.until(() => document.querySelectorAll(".row").length > 5);
+    await clickLane(page, 2, noon + 1700);
+    await state(page, "playing");
+    const hash = await page.run(() => location.hash);
+    const [, id, ms] = /^event(\d+) time (\d+) /.exec(archive.asked[0]!)!;
+    expect(hash).toBe(`#event=${id}`);
+    // A pixel of this day is more than a minute.
+    expect(Math.abs((Number(id) - 40) * 300 + Number(ms) / 1000 - 1700)).toBeLessThan(90);
+    await page.run(() => (document.activeElement as HTMLElement).blur());
+    await page.press(" ");
+    await state(page, "paused");
+    const before = await frame(page);
+    expect(before.painted).toBe(before.told % 16);
+    await page.press("ArrowRight");
+    await page.until((told) => document.querySelector(".transport-frame")!.textContent!.startsWith(`frame ${told} `), before.told + 2);
+    await state(page, "paused");
+    expect(await frame(page)).toEqual({ told: before.told + 1, painted: (before.told + 1) % 16 });
+    expect(archive.streams).toEqual([]);
+    await page.press("]");
+    await page.press(" ");
+    await vi.waitFor(() => expect(archive.asked.at(-1)).toMatch(/ at 2$/));
+    expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
+    await page.run(() => history.back());
+    await state(page, "empty");
+    expect(await page.run(() => location.hash)).toBe("#events");
+    await page.send("Page.close", {});
+    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+  }, 40_000);
+
+  test("an address opens its recording; the file is offered; a mark's text is text", async () => {
+    const page = await opened("#pos=90", 1440, 900);
+    await state(page, "playing");
+    expect(archive.asked[0]).toBe("pos90 frame 0 to -1 at 1");
+    const link = () => document.querySelector<HTMLAnchorElement>("a[aria-label^=Download]")!.getAttribute("href");
+    expect(await page.run(link)).toBe("webapi?api=VEXO.Event&version=1&method=Download&event=90&kind=pos");
+    await page.until(() => [...document.querySelectorAll(".row-text")].some((row) => row.textContent === "2 Tea <b> · Total 5"));
+    await page.send("Page.close", {});
+    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+  }, 40_000);
+
+  test("two cameras play the same time where the server allows it; the one that is pushed out says so", async () => {
+    const page = await opened("#event=14", 1440, 900, 4);
+    await state(page, "playing");
+    await page.run(() => document.querySelectorAll<HTMLElement>(".lane-name")[1]!.click());
+    await page.until(() => document.querySelectorAll(".stage-picture[data-state=playing]").length === 2);
+    const times = await page.run(() => [...document.querySelectorAll(".stage-time")].map((time) => time.textContent!));
+    const [first, second] = times.map((time) => Date.parse(`2026 ${time.slice(4)}`));
+    expect(Math.abs(first! - second!)).toBeLessThanOrEqual(2000);
+    archive.streams[0]!.pushOut();
+    await page.until(() => document.querySelector(".stage-picture[data-state=pushedOut] .button") !== null);
+    await page.send("Page.close", {});
+    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+  }, 40_000);
+
+  test("a phone has all of it, nothing too small for a finger, and no sideways scrolling", async () => {
+    const page = await opened("#event=14", 390, 844);
+    await state(page, "playing");
+    const small = () =>
+      [...document.querySelectorAll("button:not(.day), a, summary, select")]
+        .filter((control) => control.getClientRects().length > 0 && control.clientHeight < 44)
+        .map((control) => control.ariaLabel ?? control.textContent);
+    expect(await page.run(small)).toEqual([]);
+    expect(await page.run(() => document.documentElement.scrollWidth)).toBe(390);
+    await page.send("Page.close", {});
+  }, 40_000);
+});
