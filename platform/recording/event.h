@@ -44,15 +44,15 @@ class LH_PLATFORM_API Event {
     int GetStartTm() const;        // seconds since the epoch (UTC)
     int GetEndTm() const;          // likewise; of an event that grows, its last second on the mount
     int GetFrameCount() const;
-    int GetVdoType() const;        // CAM_VIDEO_TYPE
-    int GetRecMethod() const;      // REC_METHOD
+    int GetVdoType() const;         // CAM_VIDEO_TYPE
+    int GetRecMethod() const;       // REC_METHOD
     std::string GetAudFmt() const;  // the codec's name; empty without sound
     int GetImgW() const;            // pixels
     int GetImgH() const;
-    bool GetRecording() const;       // still being written
-    bool GetArchived() const;        // kept apart from retention
-    std::uint64_t GetSize() const;   // bytes
-    bool IsOriginalView() const;     // a fisheye camera's picture as it came
+    bool GetRecording() const;      // still being written
+    bool GetArchived() const;       // kept apart from retention
+    std::uint64_t GetSize() const;  // bytes
+    bool IsOriginalView() const;    // a fisheye camera's picture as it came
 
     int m_Id;
     int m_CamId;

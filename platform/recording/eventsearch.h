@@ -17,15 +17,15 @@
 struct LH_PLATFORM_API EventFilterParam {
     EventFilterParam();
 
-    int m_MountId;               // 0: every mount
-    int m_Offset;                // events to leave out at the list's head
-    std::int64_t m_BeginTm;      // events that touch the span from here …
-    std::int64_t m_EndTm;        // … up to, not including, here; seconds since the epoch (UTC)
-    std::set<int> m_CamIds;      // of these cameras; empty: of none
-    std::uint8_t m_Reason;       // REC_METHOD; 0: any
-    int m_RecordingState;        // 0: all, 2: finished only
-    int m_CamVdoType;            // the camera's own CAM_VIDEO_TYPE, for lists of one camera; does not filter
-    std::string m_CamColumn;     // the column that holds the camera's id
+    int m_MountId;            // 0: every mount
+    int m_Offset;             // events to leave out at the list's head
+    std::int64_t m_BeginTm;   // events that touch the span from here …
+    std::int64_t m_EndTm;     // … up to, not including, here; seconds since the epoch (UTC)
+    std::set<int> m_CamIds;   // of these cameras; empty: of none
+    std::uint8_t m_Reason;    // REC_METHOD; 0: any
+    int m_RecordingState;     // 0: all, 2: finished only
+    int m_CamVdoType;         // the camera's own CAM_VIDEO_TYPE, for lists of one camera; does not filter
+    std::string m_CamColumn;  // the column that holds the camera's id
 };
 
 // Appends the events that the filter names, by start and id. Returns 0, or non-zero when they cannot be read.
