@@ -163,6 +163,12 @@ class Installation:
             raise AssertionError(f"lookhaven {' '.join(arguments)}: {done.stdout}{done.stderr}")
         return done.stdout
 
+    def recording_cameras(self):
+        """The cameras of which an event is open."""
+        states = self.home / "run/recordings"
+        lines = [line.split() for line in states.read_text().splitlines()] if states.exists() else []
+        return {int(camera) for camera, state, event, *_ in lines if state == "recording" and event != "0"}
+
     def add_camera(self, name, source):
         """The id of a new camera."""
         return json.loads(self.cli("camera", "add", "--enable", "--name", name, "--source", source, "--json"))["id"]

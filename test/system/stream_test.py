@@ -62,6 +62,8 @@ class StreamTest(unittest.TestCase):
         # Two viewers stay all along, so that the rings are the same before and after.
         with self.server.live(1) as one, self.server.live(4) as four:
             one.next(), four.next()
+            # The files of what is recorded are open all along, too.
+            wait_until(lambda: self.server.recording_cameras() == {1, 2}, 20, "the recordings have begun")
             time.sleep(0.5)
             before = leftovers(self.server)
             with ThreadPoolExecutor(12) as pool:
