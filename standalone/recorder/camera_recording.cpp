@@ -149,7 +149,7 @@ std::optional<EventStart> CameraRecording::Prepare(std::int64_t first_us) {
     }
     const std::optional<int> id = surroundings_.ledger.TakeId();
     if (!id) {
-        Pause(RecordingState::kNoNumber, "the store has been away for too long");
+        Pause(RecordingState::kNoNumber, "the store has given out no number for an event yet");
         return std::nullopt;
     }
     return EventStart{*id, camera_, order_.plan.mount_id, order_.plan.mount, WallOf(first_us), first_us, Reason()};
