@@ -94,14 +94,15 @@ class EventTest : public StoreTest {
     }
 
     template <typename Filter>
-    Filter RandomSpan() {
+    Filter RandomSpan(std::int64_t first_s) {
         Filter filter;
         for (int cameras = Draw(0, 4); cameras > 0; --cameras) {
             filter.camera_ids.insert(Draw(0, 6));
         }
         if (Draw(0, 4) != 0) {
-            filter.begin_s = Draw(0, 9) == 0 ? -kNever - 1 : kDay + Draw(-10, 400) * 60;
-            filter.end_s = Draw(0, 9) == 0 ? kNever : filter.begin_s + Draw(-5, 100) * 60;
+            const std::int64_t begin_s = first_s + Draw(-10, 400) * 60;
+            filter.begin_s = Draw(0, 9) == 0 ? -kNever - 1 : begin_s;
+            filter.end_s = Draw(0, 9) == 0 ? kNever : begin_s + Draw(-5, 100) * 60;
         }
         filter.newest_first = Draw(0, 2) == 0;
         filter.offset = Draw(0, 2) == 0 ? Draw(0, 20) : 0;
@@ -123,7 +124,7 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
     std::ranges::for_each(all, [id = 1](Event& event) mutable { event.id = id++; });
     int found = 0;
     for (int i = 0; i < 300; ++i) {
-        auto filter = RandomSpan<EventFilter>();
+        auto filter = RandomSpan<EventFilter>(kDay);
         filter.mount_id = Draw(0, 4);
         filter.reason = Draw(0, 2) == 0 ? Draw(1, 3) : 0;
         filter.finished_only = Draw(0, 1) == 0;
@@ -291,9 +292,7 @@ TEST_P(EventTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
     marks_.AddAll(all);
     int found = 0;
     for (int i = 0; i < 100; ++i) {
-        auto filter = RandomSpan<MarkFilter>();
-        filter.begin_s = filter.begin_s > kDay / 2 ? filter.begin_s - kDay / 2 : filter.begin_s;
-        filter.end_s = filter.end_s != kNever ? filter.end_s - kDay / 2 : kNever;
+        auto filter = RandomSpan<MarkFilter>(kDay / 2);
         filter.kind = Draw(0, 1) == 0 ? std::nullopt : std::optional(MarkKind::kPos);
         const auto expected =
             Naive(all, filter, [&](const Mark& mark) { return !filter.kind || mark.kind == *filter.kind; });
