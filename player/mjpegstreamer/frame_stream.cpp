@@ -97,6 +97,6 @@ int FrameStream::NextStride() {
 void FrameStream::SetRate(int rate) {
     const int periodUs = Truncate(1000000.0 / static_cast<double>(m_Info.m_FrameRate));
     // A faster rate leaves the period alone and skips frames.
-    m_Timer.SetDelayTime(rate < 0 ? Truncate(-1.0 * periodUs * rate) : periodUs);
+    m_Timer.SetDelayTime(rate < 0 ? Wrapped(-std::int64_t{periodUs} * rate) : periodUs);
     m_Rate = rate;
 }
