@@ -8,6 +8,7 @@
 #include "platform/recording/eventsearch.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
+#include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/webapi/answer.h"
 #include "standalone/webapi/download.h"
@@ -72,6 +73,33 @@ Json::Value Describe(const store::Mark& mark) {
     json["state"] = NameOf(mark.state);
     json["text"] = LinesOf(mark.text);
     return json;
+}
+
+// With the names that the search of recorded events has for them.
+Json::Value Describe(const store::Event& event) {
+    Json::Value json;
+    json["id"] = event.id;
+    json["kind"] = "event";
+    json["camera_id"] = event.camera_id;
+    json["start"] = Json::Int64{event.start_s};
+    json["stop"] = Json::Int64{event.end_s};
+    json["frame_count"] = event.frame_count;
+    json["record_type"] = event.reason;
+    json["is_recording"] = event.recording;
+    return json;
+}
+
+template <typename AnyEvent>
+std::string AnswerVisible(const std::optional<AnyEvent>& event) {
+    if (!event || !binding::MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
+        throw Failure(404, "there is no such event");
+    }
+    return SuccessAnswer(Describe(*event));
+}
+
+std::string Get(binding::RequestContext& context, std::optional<store::MarkKind> kind, int id) {
+    store::Store& records = context.Records();
+    return kind ? AnswerVisible(store::Marks(records).Find(*kind, id)) : AnswerVisible(store::Events(records).Find(id));
 }
 
 std::string MarkIt(binding::RequestContext& context, const Parameters& parameters) {
@@ -150,6 +178,9 @@ std::string ServeEvent(binding::RequestContext& context, const ScgiRequest& requ
     }
     if (version == 1 && method == "List") {
         return List(context, parameters);
+    }
+    if (version == 1 && method == "Get") {
+        return Get(context, KindOf(parameters), Find(parameters, "event").asInt());
     }
     if (version == 1 && method == "Download") {
         Download(context, KindOf(parameters), Find(parameters, "event").asInt());

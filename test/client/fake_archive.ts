@@ -55,6 +55,11 @@ export class FakeArchive {
         return json({ search_time: number("start"), available_day: this.#days(query) });
       case "VEXO.Event List":
         return json({ event: idsOf(query).flatMap((camera) => this.#touching(camera, number("from"), number("to"), true).map(rawMark)) });
+      case "VEXO.Event Get": {
+        const kind = query.get("kind") ?? "event";
+        const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
+        return !one ? json(null, 404) : json(kind === "event" ? { ...rawEvent(one), camera_id: one.camera } : rawMark(one));
+      }
       case "VEXO.Catalog Groups":
         return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
       case "VEXO.Playback SetRate": {

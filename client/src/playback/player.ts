@@ -251,7 +251,7 @@ export class Player {
   async #goesOn(signal: AbortSignal): Promise<boolean> {
     const before = this.#footage!;
     const wasAtTail = before.isGrowing && performance.now() - this.#lastFrameMs >= kTailSilenceMs;
-    const footage = await this.#recordings.refresh(before).catch(() => before);
+    const footage = await this.#recordings.find(before).catch(() => before);
     if (signal.aborted) return false;
     if (!footage) {
       await this.#fail(new ServerError(404, 0, ""), signal);
@@ -273,7 +273,7 @@ export class Player {
   async #fail(error: ServerError, signal: AbortSignal): Promise<void> {
     let reason = error.message;
     if (error.status === kCannotPlay || error.status === 404) {
-      const footage = await this.#recordings.refresh(this.#footage!).catch(() => this.#footage);
+      const footage = await this.#recordings.find(this.#footage!).catch(() => this.#footage);
       if (signal.aborted) return;
       if (!footage) reason = "The recording is gone.";
       else if (error.status === 404) reason = "The recording cannot be played.";

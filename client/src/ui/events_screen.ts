@@ -19,7 +19,7 @@ import { icon } from "./icons";
 import { navigation } from "./nav";
 import { notify } from "./notice";
 import { PlayerTile } from "./player_tile";
-import { nameFootage, openFootage, placeOf } from "./route";
+import { nameFootage, openFootage } from "./route";
 import { logoutButton } from "./session_end";
 import { clockTime } from "./text";
 import { spanText } from "./time_scale";
@@ -164,9 +164,7 @@ export class EventsScreen {
     if (isSame(wanted, this.#deck.lead?.player.footage)) return;
     const opening = (this.#opening = `${wanted.kind}${wanted.id}`);
     try {
-      const place = placeOf(wanted);
-      const all = this.#cameras.map(({ id }) => id);
-      const footage = await (place ? this.#recordings.refresh(place) : this.#recordings.find(wanted, all));
+      const footage = await this.#recordings.find(wanted);
       if (this.#opening !== opening) return;
       if (footage) this.#open(footage);
       else notify("There is no such recording any more, or it is not for you to see.");

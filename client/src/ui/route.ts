@@ -3,7 +3,7 @@
 // What is open, kept in the address, so that a reload keeps it and "back" leaves it: #camera=5 on the wall; #events, and
 // there #event=7, #alert=8 or #pos=9.
 
-import type { FootagePlace, FootageRef } from "../wire/recordings";
+import type { FootageRef } from "../wire/recordings";
 
 const kPattern = /^#(camera|event|alert|pos)=(\d+)$/;
 
@@ -45,17 +45,10 @@ export function showWall(): void {
   dispatchEvent(new PopStateEvent("popstate"));
 }
 
-/** Where it was when it was opened here; null for an address that came from elsewhere. */
-export function placeOf({ kind, id }: FootageRef): FootagePlace | null {
-  const place = (history.state as { footage?: FootagePlace } | null)?.footage;
-  return place?.kind === kind && place.id === id ? place : null;
-}
-
 /** Says in the address what is being played; as with cameras, all of it is one entry in the history. */
-export function nameFootage({ kind, id, camera, start }: FootagePlace): void {
+export function nameFootage({ kind, id }: FootageRef): void {
   const hash = `#${kind}=${id}`;
   if (location.hash === hash) return;
-  const state = { footage: { kind, id, camera, start } };
-  if (openFootage() === null) history.pushState(state, "", hash);
-  else history.replaceState(state, "", hash);
+  if (openFootage() === null) history.pushState(null, "", hash);
+  else history.replaceState(null, "", hash);
 }

@@ -13,15 +13,11 @@ export interface FootageRef {
   id: number;
 }
 
-/** Enough to ask the server for it. */
-export interface FootagePlace extends FootageRef {
+/** Something that can be played. */
+export interface Footage extends FootageRef {
   camera: number;
   /** Unix seconds. */
   start: number;
-}
-
-/** Something that can be played. */
-export interface Footage extends FootagePlace {
   /** Of what still grows, as far as it can be played now. */
   stop: number;
   /** When what a mark tells of happened; its footage begins before. */
@@ -95,13 +91,6 @@ const kKinds: Record<FootageKind, number> = { event: 0, alert: 1, pos: 2 };
 const kFarFrame = 1_000_000_000;
 /** The most the server lists at once. */
 const kMostMarks = 10_000;
-const kDayS = 86_400;
-const kSearchedDays = [
-  [1, 0],
-  [7, 1],
-  [19, 7],
-  [31, 19],
-] as const;
 const kLargestKey = 2 ** 31 - 1;
 
 /** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
@@ -158,31 +147,17 @@ export class Recordings {
     return answer.group.map(({ id, name, camera }) => ({ id, name, cameras: camera }));
   }
 
-  /**
-   * The event or mark of an address among those of the cameras; null when there is none. The server lists by time, not
-   * by id: events are looked for in the last 31 days, the newest first, marks among the newest ten thousand.
-   */
-  async find({ kind, id }: FootageRef, cameras: readonly number[]): Promise<Footage | null> {
-    const nowS = Math.floor(Date.now() / 1000);
-    if (kind !== "event") {
-      return (await this.marks(0, nowS, cameras)).find((mark) => mark.kind === kind && mark.id === id) ?? null;
+  /** What the server knows of it now; null when there is no such thing, or not for this user. */
+  async find({ kind, id }: FootageRef): Promise<Footage | null> {
+    const which = { event: String(id), ...kindParameter(kind) };
+    try {
+      if (kind !== "event") return markOf(await this.#server.call<RawMark>("VEXO.Event", "Get", which));
+      const raw = await this.#server.call<RawEvent & { camera_id: number }>("VEXO.Event", "Get", which);
+      return footageOf(raw, raw.camera_id);
+    } catch (error) {
+      if (error instanceof ServerError && error.status === 404) return null;
+      throw error;
     }
-    for (const [fromDay, toDay] of kSearchedDays) {
-      const [fromS, toS] = [nowS - fromDay * kDayS, nowS - toDay * kDayS];
-      const found = (await this.history(fromS, toS, cameras, kDayS)).flatMap(({ events }) => events);
-      const event = found.find((one) => one.id === id);
-      if (event) return event;
-    }
-    return null;
-  }
-
-  /** What the server knows of it now; null when it is gone. */
-  async refresh({ kind, id, camera, start }: FootagePlace): Promise<Footage | null> {
-    const found =
-      kind === "event"
-        ? (await this.history(start, start + 1, [camera], 1)).flatMap(({ events }) => events)
-        : await this.marks(start, start + 1, [camera]);
-    return found.find((one) => one.kind === kind && one.id === id) ?? null;
   }
 
   /**

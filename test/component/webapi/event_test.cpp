@@ -102,6 +102,8 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Download", "", 404},
         {"Event&version=1&method=Download&event=99", "", 404},
         {"Event&version=1&method=Download&event=x", "", 400},
+        {"Event&version=1&method=Get&event=99", "", 404},
+        {"Event&version=1&method=Get&event=x", "", 400},
         {"Event&version=2&method=List", "", 404},
         {"Event&version=1&method=Erase", "", 404},
         {"Catalog&version=1&method=Cameras", "", 404},
@@ -123,9 +125,15 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
     const int alert = footage_.Mark(1, 2, 1'772'366'400, 1, "door", event);
     for (const auto& [query, other_kind] : {std::pair{"&event=" + std::to_string(event), "&kind=pos"},
                                             {"&kind=alert&event=" + std::to_string(alert), "&kind=pos"}}) {
-        const std::string download = "Event&version=1&method=Download" + query;
-        EXPECT_EQ(Ask(download, "", true).status, 404) << "not even that it is there";
-        EXPECT_EQ(Ask(download + other_kind).status, 404);
+        for (const std::string method : {"Download", "Get"}) {
+            const std::string asked = "Event&version=1&method=" + method + query;
+            EXPECT_EQ(Ask(asked, "", true).status, 404) << "not even that it is there";
+            EXPECT_EQ(Ask(asked + other_kind).status, 404);
+        }
+        const Json::Value told = Ask("Event&version=1&method=Get" + query).Json()["data"];
+        EXPECT_EQ(told["camera_id"], 2);
+        EXPECT_EQ(told[told["kind"] == "event" ? "start" : "time"], 1'772'366'400);
+        EXPECT_EQ(told["frame_count"].isInt(), told["kind"] == "event");
     }
     std::ofstream(footage_.FileOf(event)) << "";
     EXPECT_EQ(Ask("Event&version=1&method=Download&event=" + std::to_string(event)).status, 404) << "an empty file";
