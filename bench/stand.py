@@ -73,14 +73,18 @@ def wait_until(condition, what, seconds=10):
 class Stand:
     """Use as a context manager: everything started ends with it, and its folder goes."""
 
-    def __init__(self, bin_folder):
+    def __init__(self, bin_folder, store=None):
+        """store: the address of a store other than SQLite's file."""
         self._bin = bin_folder
         self._home = pathlib.Path(tempfile.mkdtemp(prefix="lookhaven-bench-"))
         self._environment = {**os.environ, "LOOKHAVEN_HOME": str(self._home)}
         self._processes = {}
         self.http_port = free_port()
         self.socket = str(self._home / "run" / "webapi.sock")
+        self.database = self._home / "lookhaven.db"
         try:
+            if store is not None:
+                (self._home / "store").write_text(store + "\n")
             self._run("init", "--admin", "admin", stdin=PASSWORD + "\n")
         except BaseException:
             shutil.rmtree(self._home)
@@ -108,6 +112,9 @@ class Stand:
 
     def add_camera(self, name, source, video_type="mjpeg"):
         self._run("camera", "add", "--name", name, "--type", video_type, "--source", source)
+
+    def add_events(self, count, days):
+        self._run("demo", "events", "--count", str(count), "--days", str(days))
 
     def start_feeder(self, camera, codec, frame_bytes, frames_per_second):
         self._start(
