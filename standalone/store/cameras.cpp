@@ -135,6 +135,7 @@ void Cameras::Remove(int id) {
         RaiseRevision(sql);
         RequireCameraRow(sql, id);
         sql << "delete from cameras where id = :id", soci::use(id, "id");
+        sql << "delete from camera_ports where camera_id = :id", soci::use(id, "id");
     });
 }
 

@@ -82,7 +82,8 @@ class Connection {
     soci::session session_;
 };
 
-// The next id of "user", "camera", "event", "mount" or "group". Inside Write only; concurrent callers wait for each other until the commit.
+// The next id of "user", "camera", "event" or another counter of schema.cpp. Inside Write only; concurrent callers wait
+// for each other until the commit.
 int NextId(soci::session& sql, const std::string& counter);
 
 // The first of that many ids in a row. Inside Write only.

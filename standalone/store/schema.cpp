@@ -76,9 +76,45 @@ constexpr const char* kRecordings[] = {
     " primary key (user_id, access, group_id))",
 };
 
+constexpr const char* kEmaps[] = {
+    "insert into counters (name, value) values ('emap', 0), ('door', 0), ('io', 0), ('pos', 0), ('server', 0)",
+
+    "create table servers (id integer not null primary key, name text not null unique, address text not null,"
+    " port integer not null, secret text not null, certificate text not null, enabled integer not null)",
+    "create table remote_cameras (id integer not null primary key,"
+    " server_id integer not null references servers (id) on delete cascade, id_on_server integer not null,"
+    " name text not null, video_type integer not null, audio integer not null, unique (server_id, id_on_server))",
+
+    "create table emaps (id integer not null primary key, name text not null unique, image text not null,"
+    " hide_names integer not null, small_items integer not null, revision integer not null)",
+    "create table emap_items (emap_id integer not null references emaps (id) on delete cascade,"
+    " place integer not null, type integer not null, device_id integer not null, name text not null,"
+    " server_id integer not null, x integer not null, y integer not null, direction integer not null,"
+    " text_pos integer not null, icon_center_x integer not null, icon_center_y integer not null,"
+    " port integer not null, primary key (emap_id, place))",
+
+    // server_id 0 is this host, so no reference.
+    "create table devices (kind integer not null, id integer not null, name text not null,"
+    " server_id integer not null, id_on_server integer not null, camera_id integer not null,"
+    " primary key (kind, id), unique (kind, server_id, id_on_server))",
+    "create table device_ports (kind integer not null, device_id integer not null, port integer not null,"
+    " type integer not null, camera_id integer not null, primary key (kind, device_id, port),"
+    " foreign key (kind, device_id) references devices (kind, id) on delete cascade)",
+    "create table device_states (kind integer not null, device_id integer not null, port integer not null,"
+    " state text not null, since_s bigint not null, primary key (kind, device_id, port),"
+    " foreign key (kind, device_id) references devices (kind, id) on delete cascade)",
+    // Of this host's cameras and of recording servers'.
+    "create table camera_ports (camera_id integer not null primary key, inputs integer not null,"
+    " outputs integer not null)",
+
+    "create table denied_items (user_id integer not null references users (id) on delete cascade,"
+    " kind integer not null, item_id integer not null, primary key (user_id, kind, item_id))",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
+    {"e-maps, their devices, recording servers", kEmaps},
 };
 
 }  // namespace

@@ -54,31 +54,35 @@ constexpr DenialTable kDeniedGroups = {
     "insert into denied_groups (user_id, group_id, access) values (:user, :subject, :access) on conflict do nothing",
     "delete from denied_groups where user_id = :user and group_id = :subject and access = :access"};
 
-void ForEachKind(soci::session& sql, const char* statement, int user, int subject,
-                 std::initializer_list<CameraAccess> kinds) {
-    for (const CameraAccess kind : kinds) {
+constexpr DenialTable kDeniedItems = {
+    "insert into denied_items (user_id, item_id, kind) values (:user, :subject, :access) on conflict do nothing",
+    "delete from denied_items where user_id = :user and item_id = :subject and kind = :access"};
+
+// Kinds: a list of CameraAccess or DeniableItem.
+template <typename Kinds>
+void ForEachKind(soci::session& sql, const char* statement, int user, int subject, const Kinds& kinds) {
+    for (const auto kind : kinds) {
         const int access = static_cast<int>(kind);
         sql << statement, soci::use(user, "user"), soci::use(subject, "subject"), soci::use(access, "access");
     }
 }
 
-void DenyRows(soci::session& sql, const DenialTable& table, int user, int subject,
-              std::initializer_list<CameraAccess> kinds) {
+template <typename Kinds>
+void DenyRows(soci::session& sql, const DenialTable& table, int user, int subject, const Kinds& kinds) {
     RequireUser(sql, user);
     ForEachKind(sql, table.insert, user, subject, kinds);
     EndSessions(sql, user);
 }
 
-void AllowRows(soci::session& sql, const DenialTable& table, int user, int subject,
-               std::initializer_list<CameraAccess> kinds) {
+template <typename Kinds>
+void AllowRows(soci::session& sql, const DenialTable& table, int user, int subject, const Kinds& kinds) {
     RequireUser(sql, user);
     ForEachKind(sql, table.remove, user, subject, kinds);
 }
 
-std::set<int> DeniedIds(soci::session& sql, const char* query, int user, CameraAccess kind) {
+std::set<int> DeniedIds(soci::session& sql, const char* query, int user, int access) {
     std::set<int> ids;
     int id = 0;
-    const int access = static_cast<int>(kind);
     soci::statement rows = (sql.prepare << query, soci::use(user, "user"), soci::use(access, "access"), soci::into(id));
     rows.execute();
     while (rows.fetch()) {
@@ -194,6 +198,16 @@ void Users::AllowGroup(int id, int group_id, std::initializer_list<CameraAccess>
     connection_.Write([&](soci::session& sql) { AllowRows(sql, kDeniedGroups, id, group_id, kinds); });
 }
 
+void Users::DenyItem(int id, DeniableItem kind, int item_id) {
+    connection_.Write(
+        [&](soci::session& sql) { DenyRows(sql, kDeniedItems, id, item_id, std::initializer_list{kind}); });
+}
+
+void Users::AllowItem(int id, DeniableItem kind, int item_id) {
+    connection_.Write(
+        [&](soci::session& sql) { AllowRows(sql, kDeniedItems, id, item_id, std::initializer_list{kind}); });
+}
+
 void Users::Remove(int id) {
     connection_.Write([&](soci::session& sql) {
         RequireUser(sql, id);
@@ -208,14 +222,21 @@ std::set<int> Users::DeniedCameras(int id, CameraAccess kind) {
                          " union select camera_id from group_cameras join denied_groups"
                          " on denied_groups.group_id = group_cameras.group_id"
                          " where user_id = :user and access = :access",
-                         id, kind);
+                         id, static_cast<int>(kind));
     });
 }
 
 std::set<int> Users::DeniedGroups(int id, CameraAccess kind) {
     return connection_.Read([&](soci::session& sql) {
         return DeniedIds(sql, "select group_id from denied_groups where user_id = :user and access = :access", id,
-                         kind);
+                         static_cast<int>(kind));
+    });
+}
+
+std::set<int> Users::DeniedItems(int id, DeniableItem kind) {
+    return connection_.Read([&](soci::session& sql) {
+        return DeniedIds(sql, "select item_id from denied_items where user_id = :user and kind = :access", id,
+                         static_cast<int>(kind));
     });
 }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Accounts: who may log in, how much they may do, which cameras and groups are denied to them.
+// Accounts: who may log in, how much they may do, what is denied to them.
 #pragma once
 
 #include <initializer_list>
@@ -23,6 +23,9 @@ enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
 enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8 };
 constexpr std::initializer_list<CameraAccess> kEveryAccess = {CameraAccess::kLive, CameraAccess::kPlayback,
                                                               CameraAccess::kAudio};
+
+// What else may be denied; the numbers are those of e-map items, and are stored.
+enum class DeniableItem : int { kEmap = 1, kDoor = 2, kIoModule = 3 };
 
 struct User {
     int id = 0;  // from 1, never used twice
@@ -62,12 +65,16 @@ class Users {
     void Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void DenyGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void AllowGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
+    // item_id need not exist (yet, or any more).
+    void DenyItem(int id, DeniableItem kind, int item_id);
+    void AllowItem(int id, DeniableItem kind, int item_id);
     void Remove(int id);
 
     // The cameras at which the user lacks that access, by themselves or as members of a denied group; empty for an
     // unknown user.
     std::set<int> DeniedCameras(int id, CameraAccess kind);
     std::set<int> DeniedGroups(int id, CameraAccess kind);
+    std::set<int> DeniedItems(int id, DeniableItem kind);
 
   private:
     Connection& connection_;
