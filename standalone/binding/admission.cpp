@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Who may come in, and what this host is: a recorder of its own, without a managing host or recording servers.
+// The recording service of this host, and the right to use the application.
 #include "platform/admission/host.h"
 #include "platform/admission/pairauth.h"
 #include "platform/live/commoncfg.h"
@@ -45,14 +45,6 @@ bool IsLHRunning() {
     return record != nullptr && ring::IsRecorderAlive(*record);
 }
 
-bool IsCmsHost() {
-    return false;
-}
-
-int GetCamOwnerHxId(int) {
-    return 0;
-}
-
 // The default task set is every processor, where a process runs anyway; there are no others.
 void LHTaskSet::SetAffinity(const std::string&) {}
 
@@ -60,15 +52,4 @@ bool SDKUser::AppPrivUserHas(const std::string& userName, const std::string& app
     return application == lookhaven::binding::kApplication && OrFailure("AppPrivUserHas", false, [&] {
                return lookhaven::store::Users(RequestContext::Current().Records()).FindByName(userName).has_value();
            });
-}
-
-// Matching needs a secret that two hosts share. This host has no way to be paired yet, so nothing can match.
-bool IsAuthPairMatch(const std::string&, const std::string&) {
-    return false;
-}
-
-SlaveHxAuthentication::SlaveHxAuthentication() = default;
-
-bool SlaveHxAuthentication::IsAuthByPairMatch(const std::string&, const std::string&) {
-    return false;
 }

@@ -1,141 +1,93 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps and their devices on a host that keeps none yet: no map loads, no device but cameras is known, no recording
-// server is managed, and no door is anybody's.
+// E-maps with the items placed on them, as far as the caller may see the map.
 #include "platform/emap/emap.h"
-#include "platform/admission/slavehx.h"
-#include "platform/camera/camera.h"
-#include "platform/emap/device.h"
-#include "platform/privilege/privprofile.h"
+
+#include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/emap_pictures.h"
+#include "standalone/store/emaps.h"
+#include "standalone/store/text.h"
+
+namespace store = lookhaven::store;
+using lookhaven::binding::OrFailure;
+using lookhaven::binding::RequestContext;
+
+static_assert(static_cast<int>(store::EmapItemType::kCamera) == EMAP_ITEM_CAMERA);
+static_assert(static_cast<int>(store::EmapItemType::kEmap) == EMAP_ITEM_EMAP);
+static_assert(static_cast<int>(store::EmapItemType::kDoor) == EMAP_ITEM_DOOR);
+static_assert(static_cast<int>(store::EmapItemType::kIoModule) == EMAP_ITEM_IO_MODULE);
+static_assert(static_cast<int>(store::EmapItemType::kPos) == EMAP_ITEM_POS);
 
 namespace {
 
 constexpr int kNotFound = -1;
-constexpr int kNoDevice = 0;
 
 }  // namespace
 
-struct Emap::Record {};
+struct Emap::Record {
+    store::Emap emap;
+    std::vector<store::EmapItem> items;
+};
 
-Emap::Emap() = default;
+Emap::Emap() : m_pRecord(std::make_unique<Record>()) {}
 Emap::~Emap() = default;
 
-int Emap::Load(int) {
-    return kNotFound;
+int Emap::Load(int emapId) {
+    return OrFailure("Emap::Load", kNotFound, [&] {
+        if (!lookhaven::binding::MaySee(store::DeniableItem::kEmap, emapId)) {
+            return kNotFound;
+        }
+        store::Emaps emaps(RequestContext::Current().Records());
+        const auto found = emaps.Find(emapId);
+        if (!found) {
+            return kNotFound;
+        }
+        *m_pRecord = {*found, emaps.Items(emapId)};
+        return 0;
+    });
 }
 
 std::string Emap::GetImgName() const {
-    return {};
+    return m_pRecord->emap.image;
 }
 
 int Emap::GetItemNum() const {
+    return static_cast<int>(m_pRecord->items.size());
+}
+
+int Emap::GetItem(int index, __tag_EMAP_ITEM_INFO& item) const {
+    if (index < 0 || index >= GetItemNum()) {
+        return kNotFound;
+    }
+    const store::EmapItem& from = m_pRecord->items[static_cast<std::size_t>(index)];
+    item = {static_cast<int>(from.type),
+            from.device_id,
+            from.name,
+            from.server_id,
+            from.x,
+            from.y,
+            from.direction,
+            from.text_pos,
+            from.icon_center_x,
+            from.icon_center_y,
+            from.port};
     return 0;
 }
 
-int Emap::GetItem(int, __tag_EMAP_ITEM_INFO&) const {
-    return kNotFound;
-}
-
 bool Emap::GetHideItemName() const {
-    return false;
+    return m_pRecord->emap.hide_names;
 }
 
 bool Emap::GetSmallItemSize() const {
-    return false;
+    return m_pRecord->emap.small_items;
 }
 
-std::string LoadEmapImgBase64String(const std::string&, int& length) {
-    length = 0;
-    return {};
-}
-
-int Camera::LoadByIdOnRecServer(int, int) {
-    return kNotFound;
-}
-
-int IOModule::Load(int) {
-    return kNotFound;
-}
-
-int IOModule::LoadByIdOnRecServer(int, int) {
-    return kNotFound;
-}
-
-int IOModule::GetId() const {
-    return m_Id;
-}
-
-std::string IOModule::GetName() const {
-    return m_Name;
-}
-
-int POS::Load(int) {
-    return kNotFound;
-}
-
-int POS::LoadByIdOnRecServer(int, int) {
-    return kNotFound;
-}
-
-int POS::GetPairedCamIdOnRec() const {
-    return m_PairedCamIdOnRec;
-}
-
-std::map<int, CamDetSetting> GetCamDetMap(const std::string&) {
-    return {};
-}
-
-std::map<int, CamDeviceOutput> GetCamDOMap(const std::string&) {
-    return {};
-}
-
-std::map<int, IOModuleSetting> GetIOModuleSettingMap(const std::string&) {
-    return {};
-}
-
-int GetCamIdOnHost(int, int) {
-    return kNoDevice;
-}
-
-int GetIOModuleIdOnHost(int, int) {
-    return kNoDevice;
-}
-
-void GetPairedCam(int, int, int& camId, int& camServerId, int& camIdOnServer) {
-    camId = camServerId = camIdOnServer = kNoDevice;
-}
-
-SlaveHx::SlaveHx(std::string ip, int port, std::string cookie)
-    : m_Ip(std::move(ip)),
-      m_Port(port),
-      m_Cookie(std::move(cookie)) {}
-
-std::string SlaveHx::GetIP() const {
-    return m_Ip;
-}
-
-int SlaveHx::GetPort() const {
-    return m_Port;
-}
-
-std::string SlaveHx::GetCookie() const {
-    return m_Cookie;
-}
-
-SlaveHxMgr::SlaveHxMgr(bool) {}
-
-std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool, bool, bool) const {
-    return m_Servers;
-}
-
-std::set<int> PrivProfile::GetInaEmapIdSet(ITEM_PRIV_TYPE, bool) const {
-    return {};
-}
-
-std::set<int> PrivProfile::GetInaIOIdSet(bool) const {
-    return {};
-}
-
-bool IsDoorPrivAllowed(const PrivProfile&, DOOR_PRIV_TYPE, int) {
-    return false;
+std::string LoadEmapImgBase64String(const std::string& imageName, int& length) {
+    const std::string text = OrFailure("LoadEmapImgBase64String", std::string(), [&] {
+        RequestContext& context = RequestContext::Current();
+        return store::ToBase64(store::EmapPictures(context.Records(), context.Home().Home()).Read(imageName));
+    });
+    length = static_cast<int>(text.size());
+    return text;
 }

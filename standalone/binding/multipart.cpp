@@ -10,11 +10,11 @@
 #include <cstdint>
 #include <string>
 
-#include <sodium.h>
 
 #include "platform/output/multipartresponse.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/store/text.h"
 
 namespace {
 
@@ -51,11 +51,7 @@ std::string Base64(const unsigned char* data, int length) {
     if (data == nullptr || length <= 0 || static_cast<std::size_t>(length) > lookhaven::ring::kMaxExtraBytes) {
         return "";
     }
-    const auto bytes = static_cast<std::size_t>(length);
-    std::string text(sodium_base64_ENCODED_LEN(bytes, sodium_base64_VARIANT_ORIGINAL), '\0');
-    sodium_bin2base64(text.data(), text.size(), data, bytes, sodium_base64_VARIANT_ORIGINAL);
-    text.pop_back();  // the terminating zero
-    return text;
+    return lookhaven::store::ToBase64({reinterpret_cast<const char*>(data), static_cast<std::size_t>(length)});
 }
 
 }  // namespace

@@ -47,6 +47,17 @@ bool MayUse(int camera, store::CameraAccess kind) {
     return users.Find(id) && !users.DeniedCameras(id, kind).contains(camera);
 }
 
+bool MaySee(store::DeniableItem kind, int id) {
+    RequestContext& context = RequestContext::Current();
+    const unsigned int caller = context.Caller();
+    if (caller == 0 || caller == PAIR_AUTH_UID) {
+        return caller != 0;
+    }
+    store::Users users(context.Records());
+    const int user = static_cast<int>(caller);
+    return users.Find(user) && !users.DeniedItems(user, kind).contains(id);
+}
+
 std::set<int> DeniedCameras(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     std::set<int> denied = context.RenouncedCameras();
@@ -57,6 +68,19 @@ std::set<int> DeniedCameras(store::CameraAccess kind) {
 }
 
 }  // namespace lookhaven::binding
+
+namespace {
+
+// Neither nobody nor a peer.
+bool IsUser(int profile_id) {
+    return profile_id != 0 && profile_id != static_cast<int>(PAIR_AUTH_UID);
+}
+
+store::Users Users() {
+    return store::Users(RequestContext::Current().Records());
+}
+
+}  // namespace
 
 struct PrivProfile::Data {
     int id = 0;
@@ -82,12 +106,23 @@ std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool) const {
     return denied == m_pData->denied_cameras.end() ? std::set<int>{} : denied->second;
 }
 
-// Asked for by few; a store that fails is their failure too.
+// These are asked for by few; a store that fails is their failure too.
 std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
-    const bool is_user = m_pData->id != 0 && m_pData->id != static_cast<int>(PAIR_AUTH_UID);
-    return is_user ? store::Users(RequestContext::Current().Records())
-                         .DeniedGroups(m_pData->id, static_cast<store::CameraAccess>(type))
-                   : std::set<int>{};
+    return IsUser(m_pData->id) ? Users().DeniedGroups(m_pData->id, static_cast<store::CameraAccess>(type))
+                               : std::set<int>{};
+}
+
+std::set<int> PrivProfile::GetInaEmapIdSet(ITEM_PRIV_TYPE, bool) const {
+    return IsUser(m_pData->id) ? Users().DeniedItems(m_pData->id, store::DeniableItem::kEmap) : std::set<int>{};
+}
+
+std::set<int> PrivProfile::GetInaIOIdSet(bool) const {
+    return IsUser(m_pData->id) ? Users().DeniedItems(m_pData->id, store::DeniableItem::kIoModule) : std::set<int>{};
+}
+
+bool IsDoorPrivAllowed(const PrivProfile& profile, DOOR_PRIV_TYPE, int doorId) {
+    return IsUser(profile.GetId()) ? !Users().DeniedItems(profile.GetId(), store::DeniableItem::kDoor).contains(doorId)
+                                   : profile.GetId() != 0;
 }
 
 void PrivProfile::UpdateByJson(const Json::Value& privData) {

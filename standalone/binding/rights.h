@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the caller of this request process may do with a camera.
+// What the caller of this request process may do with a camera, or see of an e-map, a door or an I/O module.
 //
 // Why so        The module's handlers filter what they show, not all of them everything. So the platform asks here before it
 //               opens anything of a camera.
@@ -22,6 +22,9 @@ LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
 // False for a camera that is denied to the caller or that the request renounces, and for nobody as the caller. Throws
 // store::StoreError.
 LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
+
+// False for an item that is denied to the caller, and for nobody as the caller. Throws store::StoreError.
+LH_PLATFORM_API bool MaySee(store::DeniableItem kind, int id);
 
 // The cameras at which MayUse is false for a caller who is somebody. Throws store::StoreError.
 LH_PLATFORM_API std::set<int> DeniedCameras(store::CameraAccess kind);

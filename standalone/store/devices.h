@@ -29,12 +29,12 @@ constexpr int kMaxPorts = 64;
 // A door, an I/O module or a till. Doors are always this host's own.
 struct Device {
     EmapItemType kind = EmapItemType::kDoor;
-    int id = 0;                 // from 1, never used twice within its kind
-    std::string name;           // UTF-8, 1 to 64 bytes
-    int server_id = 0;          // the recording server that owns it; 0: this host
-    int id_on_server = 0;       // its id there; the same as id for this host's own
-    int camera_id = 0;          // that watches a door or till, by its id on this host; 0: none
-    std::map<int, Port> ports;  // of an I/O module, by index from 0
+    int id = 0;                      // from 1, never used twice within its kind
+    std::string name = {};           // UTF-8, 1 to 64 bytes
+    int server_id = 0;               // the recording server that owns it; 0: this host
+    int id_on_server = 0;            // its id there; the same as id for this host's own
+    int camera_id = 0;               // that watches a door or till, by its id on this host; 0: none
+    std::map<int, Port> ports = {};  // of an I/O module, by index from 0
 };
 
 // A device's inputs come first, its outputs after them.

@@ -140,6 +140,13 @@ void InsertItem(soci::session& sql, int id, int place, const EmapItem& item) {
         soci::use(item.port, "port");
 }
 
+void SetFlags(soci::session& sql, const Emap& emap) {
+    const int hide_names = emap.hide_names ? 1 : 0;
+    const int small_items = emap.small_items ? 1 : 0;
+    sql << "update emaps set hide_names = :hide, small_items = :small where id = :id", soci::use(hide_names, "hide"),
+        soci::use(small_items, "small"), soci::use(emap.id, "id");
+}
+
 void RaiseMapRevision(soci::session& sql, int id) {
     sql << "update emaps set revision = revision + 1 where id = :id", soci::use(id, "id");
 }
@@ -151,12 +158,10 @@ int Emaps::Add(const Emap& emap) {
         Emap added = emap;
         added.id = NextId(sql, "emap");
         RequireFreeName(sql, added);
-        const int hide_names = emap.hide_names ? 1 : 0;
-        const int small_items = emap.small_items ? 1 : 0;
-        sql << "insert into emaps (id, name, image, hide_names, small_items, revision)"
-               " values (:id, :name, '', :hide, :small, 1)",
-            soci::use(added.id, "id"), soci::use(added.name, "name"), soci::use(hide_names, "hide"),
-            soci::use(small_items, "small");
+        sql << "insert into emaps (id, name, image, hide_names, small_items, revision) values (:id, :name, '', 0, 0, "
+               "1)",
+            soci::use(added.id, "id"), soci::use(added.name, "name");
+        SetFlags(sql, added);
         RaiseRevision(sql);
         return added.id;
     });
@@ -168,12 +173,17 @@ void Emaps::Update(const Emap& emap) {
         RaiseMapRevision(sql, emap.id);  // first, so that no other change comes between
         Require(sql, emap.id);
         RequireFreeName(sql, emap);
-        const int hide_names = emap.hide_names ? 1 : 0;
-        const int small_items = emap.small_items ? 1 : 0;
-        sql << "update emaps set name = :name, image = :image, hide_names = :hide, small_items = :small"
-               " where id = :id",
-            soci::use(emap.name, "name"), soci::use(emap.image, "image"), soci::use(hide_names, "hide"),
-            soci::use(small_items, "small"), soci::use(emap.id, "id");
+        sql << "update emaps set name = :name where id = :id", soci::use(emap.name, "name"), soci::use(emap.id, "id");
+        SetFlags(sql, emap);
+    });
+}
+
+void Emaps::SetImage(int id, const std::string& image) {
+    connection_.Write([&](soci::session& sql) {
+        RaiseRevision(sql);
+        RaiseMapRevision(sql, id);
+        Require(sql, id);
+        sql << "update emaps set image = :image where id = :id", soci::use(image, "image"), soci::use(id, "id");
     });
 }
 
@@ -198,28 +208,29 @@ std::vector<EmapItem> Emaps::Items(int id) {
     return connection_.Read([&](soci::session& sql) { return FetchItems(sql, id); });
 }
 
-int Emaps::ReplaceItems(int id, int revision, const std::vector<EmapItem>& items) {
+int Emaps::ReplaceItems(const Emap& emap, const std::vector<EmapItem>& items) {
     if (items.size() > kMaxEmapItems) {
         throw InvalidRecord("an e-map holds at most 1000 items");
     }
     std::ranges::for_each(items, RequireValid);
     return connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RaiseMapRevision(sql, id);
-        const Emap emap = Require(sql, id);
-        if (emap.revision - 1 != revision) {
-            throw Conflict("the e-map " + std::to_string(id) + " was changed by someone else");
+        RaiseMapRevision(sql, emap.id);
+        const int revision = Require(sql, emap.id).revision;
+        if (revision - 1 != emap.revision) {
+            throw Conflict("the e-map " + std::to_string(emap.id) + " was changed by someone else");
         }
-        const std::vector<EmapItem> before = FetchItems(sql, id);
-        sql << "delete from emap_items where emap_id = :id", soci::use(id, "id");
+        SetFlags(sql, emap);
+        const std::vector<EmapItem> before = FetchItems(sql, emap.id);
+        sql << "delete from emap_items where emap_id = :id", soci::use(emap.id, "id");
         int place = 0;
         for (const EmapItem& item : items) {
             if (std::ranges::none_of(before, [&](const EmapItem& old) { return SameDevice(old, item); })) {
                 RequireDevice(sql, item);
             }
-            InsertItem(sql, id, place++, item);
+            InsertItem(sql, emap.id, place++, item);
         }
-        return emap.revision;
+        return revision;
     });
 }
 

@@ -16,10 +16,10 @@ enum class EmapItemType : int { kCamera = 0, kEmap = 1, kDoor = 2, kIoModule = 3
 
 struct EmapItem {
     EmapItemType type = EmapItemType::kCamera;
-    int device_id = 0;  // on the device's own server
-    std::string name;   // UTF-8, up to 255 bytes
-    int server_id = 0;  // the recording server that owns the device; 0: this host
-    int x = 0;          // pixels of the picture, as y
+    int device_id = 0;      // on the device's own server
+    std::string name = {};  // UTF-8, up to 255 bytes
+    int server_id = 0;      // the recording server that owns the device; 0: this host
+    int x = 0;              // pixels of the picture, as y
     int y = 0;
     int direction = 0;      // degrees clockwise from up, 0 to 359
     int text_pos = 0;       // of the name: 0 below, 1 above, 2 left, 3 right
@@ -31,9 +31,9 @@ struct EmapItem {
 };
 
 struct Emap {
-    int id = 0;         // from 1, never used twice
-    std::string name;   // UTF-8, 1 to 64 bytes, no other map's
-    std::string image;  // the picture's file name; empty until there is one
+    int id = 0;              // from 1, never used twice
+    std::string name = {};   // UTF-8, 1 to 64 bytes, no other map's
+    std::string image = {};  // the picture's file name; empty until there is one
     bool hide_names = false;
     bool small_items = false;
     int revision = 1;  // grows with every change of the map or its items
@@ -59,8 +59,10 @@ class Emaps {
 
     // Stores name and flags under a new id, which it returns. Throws InvalidRecord or AlreadyExists.
     int Add(const Emap& emap);
-    // Replaces name, image and flags of emap.id. Throws as Add, and NotFound.
+    // Replaces name and flags of emap.id. Throws as Add, and NotFound.
     void Update(const Emap& emap);
+    // image: the name of a file that is there. Throws NotFound.
+    void SetImage(int id, const std::string& image);
     // Removes the map with its items; links to it stay until their map is changed. Throws NotFound.
     void Remove(int id);
 
@@ -69,9 +71,10 @@ class Emaps {
 
     // In the order they were given.
     std::vector<EmapItem> Items(int id);
-    // Replaces all items at once and returns the new revision. Throws NotFound for an unknown map, and for a device that
-    // is neither known nor on the map already; Conflict when the map's revision is another; InvalidRecord.
-    int ReplaceItems(int id, int revision, const std::vector<EmapItem>& items);
+    // Replaces all items and both flags of emap.id at once, and returns the new revision. Throws NotFound for an unknown
+    // map, and for a device that is neither known nor on the map already; Conflict when the map's revision is not
+    // emap.revision; InvalidRecord.
+    int ReplaceItems(const Emap& emap, const std::vector<EmapItem>& items);
 
   private:
     Connection& connection_;

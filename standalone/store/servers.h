@@ -13,11 +13,11 @@
 namespace lookhaven::store {
 
 struct RecordingServer {
-    int id = 0;               // from 1, never used twice
-    std::string name;         // UTF-8, 1 to 64 bytes, no other server's
-    std::string address;      // a host name or address; empty when only that host asks this one
-    int port = 0;             // of its web server; 0 with an empty address
-    std::string certificate;  // PEM, what its web server must show; empty: plain HTTP
+    int id = 0;                    // from 1, never used twice
+    std::string name = {};         // UTF-8, 1 to 64 bytes, no other server's
+    std::string address = {};      // a host name or address; empty when only that host asks this one
+    int port = 0;                  // of its web server; 0 with an empty address
+    std::string certificate = {};  // PEM, what its web server must show; empty: plain HTTP
     bool enabled = true;
 };
 
@@ -26,7 +26,7 @@ struct RemoteCamera {
     int id = 0;
     int server_id = 0;
     int id_on_server = 0;
-    std::string name;  // UTF-8, 1 to 255 bytes
+    std::string name = {};  // UTF-8, 1 to 255 bytes
     VideoType video_type = VideoType::kMjpeg;
     bool audio = false;
 };

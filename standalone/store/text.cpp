@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstdint>
 
+#include <sodium.h>
 #include <strings.h>
 
 namespace lookhaven::store {
@@ -89,6 +90,25 @@ bool IsHex(std::string_view text, std::size_t digits) {
     return text.size() == digits && std::all_of(text.begin(), text.end(), [](char c) {
                return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f');
            });
+}
+
+std::string ToBase64(std::string_view bytes) {
+    std::string text(sodium_base64_ENCODED_LEN(bytes.size(), sodium_base64_VARIANT_ORIGINAL), '\0');
+    sodium_bin2base64(text.data(), text.size(), reinterpret_cast<const unsigned char*>(bytes.data()), bytes.size(),
+                      sodium_base64_VARIANT_ORIGINAL);
+    text.pop_back();
+    return text;
+}
+
+std::optional<std::string> FromBase64(std::string_view text) {
+    std::string bytes(text.size() / 4 * 3 + 3, '\0');
+    std::size_t size = 0;
+    if (sodium_base642bin(reinterpret_cast<unsigned char*>(bytes.data()), bytes.size(), text.data(), text.size(),
+                          nullptr, &size, nullptr, sodium_base64_VARIANT_ORIGINAL) != 0) {
+        return std::nullopt;
+    }
+    bytes.resize(size);
+    return bytes;
 }
 
 }  // namespace lookhaven::store

@@ -1,0 +1,147 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/emap_pictures.h"
+
+#include <chrono>
+#include <set>
+#include <system_error>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include "standalone/base/file.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/text.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+namespace fs = std::filesystem;
+using namespace std::string_view_literals;
+
+constexpr auto kYoung = std::chrono::minutes(1);
+
+// Removes spaces, comments and processing instructions; false when one does not end.
+bool SkipProlog(std::string_view& text) {
+    for (;;) {
+        text.remove_prefix(std::min(text.find_first_not_of(" \t\r\n"), text.size()));
+        const std::string_view end = text.starts_with("<?") ? "?>"sv : text.starts_with("<!--") ? "-->"sv : ""sv;
+        if (end.empty()) {
+            return true;
+        }
+        const std::size_t at = text.find(end);
+        if (at == std::string_view::npos) {
+            return false;
+        }
+        text.remove_prefix(at + end.size());
+    }
+}
+
+bool IsSvg(std::string_view text) {
+    if (text.starts_with("\xef\xbb\xbf")) {
+        text.remove_prefix(3);
+    }
+    if (!SkipProlog(text)) {
+        return false;
+    }
+    if (text.starts_with("<!DOCTYPE")) {
+        const std::size_t end = text.find_first_of("[>");
+        if (end == std::string_view::npos || text[end] == '[') {
+            return false;  // entities may grow without bound
+        }
+        text.remove_prefix(end + 1);
+        if (!SkipProlog(text)) {
+            return false;
+        }
+    }
+    return text.starts_with("<svg") && text.size() > 4 && " \t\r\n/>"sv.find(text[4]) != std::string_view::npos;
+}
+
+// "<digits>-<16 hex digits>.<type>"
+bool IsPictureName(std::string_view name) {
+    const std::size_t dash = name.find('-');
+    const std::size_t dot = name.find('.');
+    if (dash == std::string_view::npos || dot != dash + 17 || dash == 0) {
+        return false;
+    }
+    const std::string_view type = name.substr(dot + 1);
+    return name.substr(0, dash).find_first_not_of("0123456789") == std::string_view::npos &&
+           IsHex(name.substr(dash + 1, 16), 16) && (type == "png" || type == "jpg" || type == "webp" || type == "svg");
+}
+
+}  // namespace
+
+std::string_view PictureType(std::string_view bytes) {
+    if (bytes.starts_with("\x89PNG\r\n\x1a\n"sv)) {
+        return "png";
+    }
+    if (bytes.starts_with("\xff\xd8\xff"sv)) {
+        return "jpg";
+    }
+    if (bytes.starts_with("RIFF") && bytes.substr(0, 12).ends_with("WEBP")) {
+        return "webp";
+    }
+    return IsSvg(bytes) ? "svg" : "";
+}
+
+void EmapPictures::Put(int emap_id, std::string_view bytes) {
+    if (bytes.size() > kMaxEmapPictureBytes) {
+        throw InvalidRecord("an e-map's picture has at most 16 MiB");
+    }
+    const std::string_view type = PictureType(bytes);
+    if (type.empty()) {
+        throw InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
+    }
+    Emaps emaps(store_);
+    if (!emaps.Find(emap_id)) {
+        throw NotFound("there is no e-map " + std::to_string(emap_id));
+    }
+    const std::string name = std::to_string(emap_id) + "-" + RandomHex(8) + "." + std::string(type);
+    fs::create_directories(folder_);
+    base::WriteFileAtomically(folder_ / name, bytes);
+    try {
+        emaps.SetImage(emap_id, name);
+    } catch (...) {
+        std::error_code ignored;
+        fs::remove(folder_ / name, ignored);
+        throw;
+    }
+    Sweep();
+}
+
+void EmapPictures::Sweep() {
+    std::set<std::string> used;
+    for (const Emap& emap : Emaps(store_).List()) {
+        used.insert(emap.image);
+    }
+    std::error_code error;
+    for (const fs::directory_entry& file : fs::directory_iterator(folder_, error)) {
+        const fs::file_time_type written = file.last_write_time(error);
+        // A young file may be one that another process is about to give to a map.
+        if (!error && !used.contains(file.path().filename()) && fs::file_time_type::clock::now() - written > kYoung) {
+            fs::remove(file.path(), error);
+        }
+    }
+}
+
+std::string EmapPictures::Read(const std::string& name) const {
+    if (!IsPictureName(name)) {
+        throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is no picture of an e-map");
+    }
+    const fs::path path = folder_ / name;
+    const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
+    struct stat about {};
+    if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode) ||
+        static_cast<std::size_t>(about.st_size) > kMaxEmapPictureBytes) {
+        throw std::system_error(EFBIG, std::generic_category(), path.string() + " is no picture file");
+    }
+    std::string bytes(static_cast<std::size_t>(about.st_size), '\0');
+    const ssize_t read = ::pread(file.Get(), bytes.data(), bytes.size(), 0);
+    if (read < 0) {
+        base::ThrowErrno("cannot read " + path.string());
+    }
+    bytes.resize(static_cast<std::size_t>(read));
+    return bytes;
+}
+
+}  // namespace lookhaven::store

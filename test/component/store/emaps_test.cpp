@@ -1,0 +1,309 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// E-maps, their pictures and devices, and the hosts that this one is paired with.
+#include "standalone/store/emaps.h"
+
+#include <fstream>
+
+#include "standalone/store/devices.h"
+#include "standalone/store/emap_pictures.h"
+#include "standalone/store/pair_token.h"
+#include "standalone/store/servers.h"
+#include "standalone/store/sessions.h"
+#include "standalone/store/settings.h"
+#include "standalone/store/users.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+const std::string kSecret(64, 'a');
+
+class EmapTest : public StoreTest {
+  protected:
+    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
+    int AddMap(const std::string& name) { return emaps_.Add({.name = name}); }
+    int AddServer(const std::string& name = "Annex") {
+        return servers_.Add({.name = name, .address = "192.0.2.7", .port = 8443}, kSecret);
+    }
+    // What a change of all items made of it.
+    int Replace(int id, std::vector<EmapItem> items) { return emaps_.ReplaceItems(*emaps_.Find(id), items); }
+
+    Emaps emaps_{store_};
+    Devices devices_{store_};
+    RecordingServers servers_{store_};
+    EmapPictures pictures_{store_, folder_};
+};
+
+TEST_P(EmapTest, ItemsComeBackAsTheyWerePutAndOnlyOnTopOfWhatWasRead) {
+    const int map = AddMap("Ground floor");
+    const int other = AddMap("Upper floor");
+    AddCamera();
+    const EmapItem camera{EmapItemType::kCamera, 1, "Gate 門 '; --", 0, -5, 99'999, 359, 3, -7, 8, 255};
+    const EmapItem link{.type = EmapItemType::kEmap, .device_id = other};
+    EXPECT_EQ(Replace(map, {link, camera, camera}), 2);
+    EXPECT_THAT(emaps_.Items(map), ElementsAre(link, camera, camera)) << "in their order";
+    EXPECT_EQ(emaps_.List().front().item_count, 3);
+    const Emap stale{.id = map, .name = "", .image = "", .hide_names = true, .revision = 1};
+    const std::int64_t before = Settings(store_).Revision();
+    EXPECT_THROW(emaps_.ReplaceItems(stale, {}), Conflict);
+    EXPECT_EQ(Settings(store_).Revision(), before);
+    EXPECT_FALSE(emaps_.Find(map)->hide_names);
+    Emap fresh = *emaps_.Find(map);
+    fresh.hide_names = fresh.small_items = true;
+    EXPECT_EQ(emaps_.ReplaceItems(fresh, {link}), 3);
+    EXPECT_TRUE(emaps_.Find(map)->hide_names && emaps_.Find(map)->small_items);
+    emaps_.Remove(other);
+    EXPECT_EQ(Replace(map, {link}), 4) << "what lost its target is no reason to refuse a change of the rest";
+    EXPECT_THROW(emaps_.ReplaceItems({.id = 99}, {}), NotFound);
+    emaps_.Remove(map);
+    EXPECT_EQ(Ask("select count(*) from emap_items"), "0");
+    EXPECT_EQ(AddMap("Ground floor"), 3) << "no id is given twice";
+}
+
+TEST_P(EmapTest, WhatBreaksARuleChangesNothing) {
+    const int map = AddMap("Ground floor");
+    AddCamera();
+    const EmapItem good{.device_id = 1};
+    Replace(map, {good});
+    const auto with = [&](auto member, auto value) {
+        EmapItem item = good;
+        item.*member = value;
+        return item;
+    };
+    for (const EmapItem& item :
+         {with(&EmapItem::type, EmapItemType(5)), with(&EmapItem::type, EmapItemType(-1)),
+          with(&EmapItem::name, std::string(256, 'n')), with(&EmapItem::name, std::string("a\nb")),
+          with(&EmapItem::x, 100'001), with(&EmapItem::y, -2'147'483'647 - 1), with(&EmapItem::direction, 360),
+          with(&EmapItem::direction, -1), with(&EmapItem::text_pos, 4), with(&EmapItem::icon_center_x, 100'001),
+          with(&EmapItem::port, -2), with(&EmapItem::port, 256)}) {
+        EXPECT_THROW(Replace(map, {good, item}), InvalidRecord);
+    }
+    for (const EmapItem& item :
+         {with(&EmapItem::device_id, 2), with(&EmapItem::server_id, 1), with(&EmapItem::type, EmapItemType::kDoor),
+          with(&EmapItem::type, EmapItemType::kIoModule), with(&EmapItem::type, EmapItemType::kPos)}) {
+        EXPECT_THROW(Replace(map, {good, item}), NotFound);
+    }
+    EXPECT_THROW(Replace(map, std::vector<EmapItem>(kMaxEmapItems + 1, good)), InvalidRecord);
+    EXPECT_THAT(emaps_.Items(map), ElementsAre(good));
+    for (const std::string& name : {std::string(), std::string(65, 'n'), std::string("a\0b", 3)}) {
+        EXPECT_THROW(AddMap(name), InvalidRecord);
+    }
+    EXPECT_THROW(AddMap("Ground floor"), AlreadyExists);
+    EXPECT_THROW(emaps_.Update({.id = 99, .name = "x"}), NotFound);
+    EXPECT_THROW(emaps_.Remove(99), NotFound);
+}
+
+TEST_P(EmapTest, TwoEditorsCannotUndoEachOther) {
+    const int map = AddMap("Ground floor");
+    AddCamera();
+    std::atomic<int> saved = 0;
+    InParallel(4, [&](Store& store) {
+        Emaps emaps(store);
+        for (int i = 0; i < 20; ++i) {
+            const Emap read = *emaps.Find(map);
+            std::vector<EmapItem> items = emaps.Items(map);
+            items.push_back({.device_id = 1});
+            try {
+                emaps.ReplaceItems(read, items);
+                ++saved;
+            } catch (const Conflict&) {
+            }
+        }
+    });
+    EXPECT_GT(saved, 20);
+    EXPECT_THAT(emaps_.Items(map), SizeIs(saved.load())) << "each that was told \"saved\" is there";
+}
+
+TEST_P(EmapTest, PicturesAreKnownByWhatTheyHold) {
+    const struct {
+        std::string bytes;
+        std::string_view type;
+    } rows[] = {
+        {"\x89PNG\r\n\x1a\n....", "png"},
+        {"\xff\xd8\xff\xe0..", "jpg"},
+        {std::string("RIFF\0\0\0\0WEBPVP8 ", 16), "webp"},
+        {std::string("RIFF\0\0\0\0WAVEfmt ", 16), ""},
+        {"<svg/>", "svg"},
+        {"\xef\xbb\xbf<?xml version=\"1.0\"?>\n<!-- a -->\n<!DOCTYPE svg PUBLIC \"a\" \"b\">\n<svg width=\"1\">",
+         "svg"},
+        {"<!DOCTYPE svg [<!ENTITY a \"b\">]><svg>", ""},
+        {"<svgx>", ""},
+        {"<svg", ""},
+        {"<!-- <svg>", ""},
+        {"<?xml", ""},
+        {"<html><svg>", ""},
+        {"GIF89a", ""},
+        {"", ""}};
+    for (const auto& row : rows) {
+        EXPECT_EQ(PictureType(row.bytes), row.type) << row.bytes;
+    }
+}
+
+TEST_P(EmapTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
+    const int map = AddMap("Ground floor");
+    pictures_.Put(map, "<svg/>");
+    const std::string first = emaps_.Find(map)->image;
+    EXPECT_EQ(pictures_.Read(first), "<svg/>");
+    EXPECT_THROW(pictures_.Put(map, "MZ"), InvalidRecord);
+    EXPECT_THROW(pictures_.Put(map, "<svg>" + std::string(kMaxEmapPictureBytes, ' ')), InvalidRecord);
+    EXPECT_THROW(pictures_.Put(99, "<svg/>"), NotFound);
+    EXPECT_EQ(emaps_.Find(map)->image, first);
+    namespace fs = std::filesystem;
+    fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
+    pictures_.Put(map, "\xff\xd8\xff\xe0");
+    EXPECT_NE(emaps_.Find(map)->image, first);
+    EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
+
+    std::ofstream(folder_ / "secret.svg") << "<svg/>";
+    const std::string ours = "1-0123456789abcdef.svg";
+    fs::create_symlink(folder_ / "secret.svg", folder_ / "emaps" / ours);
+    for (const std::string& name :
+         {ours, std::string("../secret.svg"), std::string("1-0123456789abcdef.png"), std::string("."), std::string(),
+          "/" + ours, std::string("1-0123456789abcde/.svg"), ours + std::string("\0x", 2), first}) {
+        EXPECT_THROW(pictures_.Read(name), std::system_error) << name;
+    }
+}
+
+TEST_P(EmapTest, DevicesKeepTheirPortsAndTheIdsTheyHaveElsewhere) {
+    const int camera = AddCamera();
+    const int server = AddServer();
+    const int remote = servers_.PutCamera({.server_id = server, .id_on_server = 1, .name = "Yard"});
+    EXPECT_EQ(remote, camera + 1) << "cameras of all hosts have ids of one row";
+    Device module{.kind = EmapItemType::kIoModule, .name = "Box", .server_id = server, .id_on_server = 9};
+    module.ports = {{0, {PortType::kInput, camera}}, {7, {PortType::kOutput, remote}}};
+    module.id = devices_.Add(module);
+    EXPECT_EQ(devices_.FindOnServer(EmapItemType::kIoModule, server, 9)->ports, module.ports);
+    EXPECT_THROW(devices_.Add(module), AlreadyExists);
+    const int own = devices_.Add({.kind = EmapItemType::kIoModule, .name = "Own"});
+    EXPECT_EQ(devices_.FindOnServer(EmapItemType::kIoModule, 0, own)->name, "Own");
+    EXPECT_FALSE(devices_.FindOnServer(EmapItemType::kPos, 0, own));
+    module.ports.erase(0);
+    module.server_id = 0;
+    devices_.Update(module);
+    EXPECT_EQ(devices_.Find(EmapItemType::kIoModule, module.id)->server_id, server) << "a device changes no owner";
+    EXPECT_THAT(devices_.Find(EmapItemType::kIoModule, module.id)->ports, SizeIs(1));
+    const auto refused = [&](Device device) { devices_.Add(device); };
+    EXPECT_THROW(refused({.kind = EmapItemType::kCamera, .name = "a"}), InvalidRecord);
+    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = ""}), InvalidRecord);
+    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .ports = {{0, {}}}}), InvalidRecord);
+    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .server_id = server, .id_on_server = 1}),
+                 InvalidRecord);
+    EXPECT_THROW(refused({.kind = EmapItemType::kIoModule, .name = "a", .ports = {{64, {}}}}), InvalidRecord);
+    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .server_id = 99, .id_on_server = 1}), NotFound);
+    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .camera_id = 99}), NotFound);
+
+    devices_.SetCameraPorts(remote, {2, 1});
+    EXPECT_EQ(devices_.CameraPorts().at(remote).inputs, 2);
+    EXPECT_THROW(devices_.SetCameraPorts(99, {1, 1}), NotFound);
+    EXPECT_THROW(devices_.SetCameraPorts(camera, {65, 0}), InvalidRecord);
+    servers_.Remove(server);
+    EXPECT_THAT(devices_.CameraPorts(), IsEmpty());
+    EXPECT_THAT(devices_.List(EmapItemType::kIoModule), SizeIs(1)) << "a server takes its devices along";
+    EXPECT_FALSE(servers_.FindCamera(remote));
+}
+
+TEST_P(EmapTest, AStateIsOneThatTheDeviceHasAndKnowsSinceWhen) {
+    const int door = devices_.Add({.kind = EmapItemType::kDoor, .name = "Door"});
+    const int box =
+        devices_.Add({.kind = EmapItemType::kIoModule, .name = "Box", .ports = {{2, {PortType::kInput, 0}}}});
+    devices_.Report({EmapItemType::kDoor, door, -1, "open", 100});
+    devices_.Report({EmapItemType::kDoor, door, -1, "open", 200});
+    devices_.Report({EmapItemType::kIoModule, box, 2, "on", 300});
+    devices_.Report({EmapItemType::kIoModule, box, 2, "off", 400});
+    const std::vector<DeviceState> states = devices_.States();
+    ASSERT_THAT(states, SizeIs(2));
+    EXPECT_EQ(states[0].since_s, 100) << "saying it again changes nothing";
+    EXPECT_EQ(states[1].state + std::to_string(states[1].since_s), "off400");
+    EXPECT_THROW(devices_.Report({EmapItemType::kDoor, door, -1, "on", 1}), InvalidRecord);
+    EXPECT_THROW(devices_.Report({EmapItemType::kIoModule, box, 2, "open", 1}), InvalidRecord);
+    EXPECT_THROW(devices_.Report({EmapItemType::kIoModule, box, 3, "on", 1}), NotFound);
+    EXPECT_THROW(devices_.Report({EmapItemType::kDoor, 9, -1, "open", 1}), NotFound);
+    devices_.Remove(EmapItemType::kDoor, door);
+    EXPECT_THAT(devices_.States(), SizeIs(1));
+}
+
+TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
+    Users users(store_);
+    Sessions sessions(store_);
+    const int bob = users.Add("bob", "correct horse", Privilege::kViewer).id;
+    const std::string session = sessions.Create(bob, 100).secret;
+    users.DenyItem(bob, DeniableItem::kDoor, 3);
+    users.DenyItem(bob, DeniableItem::kDoor, 3);
+    users.DenyItem(bob, DeniableItem::kEmap, 4);
+    EXPECT_FALSE(sessions.FindBySecret(session, 101));
+    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kDoor), ElementsAre(3));
+    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kIoModule), IsEmpty());
+    users.AllowItem(bob, DeniableItem::kDoor, 3);
+    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kDoor), IsEmpty());
+    EXPECT_THROW(users.DenyItem(99, DeniableItem::kDoor, 3), NotFound);
+}
+
+TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
+    const int server = AddServer();
+    EXPECT_THAT(servers_.Secrets(), ElementsAre(kSecret));
+    RecordingServer changed = *servers_.Find(server);
+    changed.enabled = false;
+    servers_.Update(changed, std::string(64, 'b'));
+    EXPECT_THAT(servers_.Secrets(), IsEmpty()) << "one that is switched off gets no answer";
+    EXPECT_EQ(servers_.FindSecret(server), "");
+    changed.enabled = true;
+    servers_.Update(changed);
+    EXPECT_EQ(servers_.FindSecret(server), std::string(64, 'b')) << "kept where none is given";
+    const RecordingServer good{.name = "B", .address = "nvr.example", .port = 1};
+    for (const std::string& secret : {std::string(), std::string(63, 'a'), std::string(64, 'g')}) {
+        EXPECT_THROW(servers_.Add(good, secret), InvalidRecord) << secret;
+    }
+    for (const char* address : {"a b", "a;b", "a/b", "a}b", "a\n", "-a", "a$b"}) {
+        EXPECT_THROW(servers_.Add({.name = "B", .address = address, .port = 1}, kSecret), InvalidRecord) << address;
+    }
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 65536}, kSecret), InvalidRecord);
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 0}, kSecret), InvalidRecord);
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1, .certificate = "x"}, kSecret), InvalidRecord);
+    EXPECT_THROW(AddServer(), AlreadyExists);
+    const int id = servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "Old"});
+    EXPECT_EQ(servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "New"}), id);
+    EXPECT_EQ(servers_.FindCamera(server, 5)->name, "New");
+    EXPECT_THROW(servers_.PutCamera({.server_id = 99, .id_on_server = 5, .name = "New"}), NotFound);
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(EmapTest);
+
+TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
+    constexpr std::int64_t kNow = 1'800'000'000;
+    const std::string now = "1800000000";
+    const std::string token = MakePairToken(kSecret, now);
+    std::string flipped = token;
+    flipped.back() = flipped.back() == '0' ? '1' : '0';
+    const struct {
+        std::string token, timestamp, secret;
+        std::int64_t at;
+        bool matches;
+    } rows[] = {{token, now, kSecret, kNow, true},
+                {token, now, kSecret, kNow + 300, true},
+                {token, now, kSecret, kNow - 300, true},
+                {token, now, kSecret, kNow + 301, false},
+                {token, now, kSecret, kNow - 301, false},
+                {token, "1800000001", kSecret, kNow, false},
+                {token, now, std::string(64, 'b'), kNow, false},
+                {flipped, now, kSecret, kNow, false},
+                {token.substr(1), now, kSecret, kNow, false},
+                {token, now, "", kNow, false},
+                {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
+                {MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
+                {MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
+                {MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
+                {MakePairToken(kSecret, ""), "", kSecret, 0, false}};
+    for (const auto& row : rows) {
+        EXPECT_EQ(PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
+            << row.timestamp << " at " << row.at;
+    }
+    EXPECT_THROW(MakePairToken("", now), std::invalid_argument);
+}
+
+}  // namespace
+}  // namespace lookhaven::store
