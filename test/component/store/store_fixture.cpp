@@ -10,20 +10,18 @@
 namespace lookhaven::store {
 
 EmptyStore::EmptyStore() {
+    std::string pattern = testing::TempDir() + "lookhaven store-XXXXXX";  // a path with a space
+    folder_ = ::mkdtemp(pattern.data());
     if (GetParam() == Engine::kPostgresql) {
         static test::TemporaryPostgres server;
         url_ = server.NewDatabase();
         return;
     }
-    std::string pattern = testing::TempDir() + "lookhaven store-XXXXXX";  // a path with a space
-    folder_ = ::mkdtemp(pattern.data());
     url_ = "sqlite:" + (folder_ / "lookhaven.db").string();
 }
 
 EmptyStore::~EmptyStore() {
-    if (!folder_.empty()) {
-        std::filesystem::remove_all(folder_);
-    }
+    std::filesystem::remove_all(folder_);
 }
 
 std::string EmptyStore::Ask(const std::string& query) {
