@@ -58,6 +58,12 @@ bool MaySee(store::DeniableItem kind, int id) {
     return users.Find(user) && !users.DeniedItems(user, kind).contains(id);
 }
 
+bool IsManager() {
+    RequestContext& context = RequestContext::Current();
+    const auto user = store::Users(context.Records()).Find(static_cast<int>(context.Caller()));
+    return user && user->IsManager();
+}
+
 std::set<int> DeniedCameras(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     std::set<int> denied = context.RenouncedCameras();

@@ -26,6 +26,9 @@ LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
 // False for an item that is denied to the caller, and for nobody as the caller. Throws store::StoreError.
 LH_PLATFORM_API bool MaySee(store::DeniableItem kind, int id);
 
+// Whether the caller is a user who administers the host. Throws store::StoreError.
+LH_PLATFORM_API bool IsManager();
+
 // The cameras at which MayUse is false for a caller who is somebody. Throws store::StoreError.
 LH_PLATFORM_API std::set<int> DeniedCameras(store::CameraAccess kind);
 

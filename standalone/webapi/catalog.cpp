@@ -3,6 +3,8 @@
 
 #include "platform/camera/camgroup.h"
 #include "platform/privilege/privprofile.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/emaps.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
 #include "standalone/webapi/answer.h"
@@ -37,8 +39,7 @@ Json::Value Groups(binding::RequestContext& context) {
 
 // A mount without a camera that the caller may see is nothing to a viewer.
 Json::Value Mounts(binding::RequestContext& context) {
-    const PrivProfile profile = PrivProfileGetByUid(context.Caller());
-    const bool is_manager = profile.GetId() != 0 && profile.GetPrivilege() <= 1;
+    const bool is_manager = binding::IsManager();
     Json::Value list(Json::arrayValue);
     for (const store::Mount& mount : store::Mounts(context.Records()).List()) {
         Json::Value cameras = IdsOf(GetCamMountMap(mount.id, "", true));
@@ -54,6 +55,19 @@ Json::Value Mounts(binding::RequestContext& context) {
     return list;
 }
 
+Json::Value Emaps(binding::RequestContext& context) {
+    Json::Value list(Json::arrayValue);
+    for (const store::EmapSummary& emap : store::Emaps(context.Records()).List()) {
+        if (binding::MaySee(store::DeniableItem::kEmap, emap.id)) {
+            Json::Value& json = list.append(Json::objectValue);
+            json["id"] = emap.id;
+            json["name"] = emap.name;
+            json["item_num"] = emap.item_count;
+        }
+    }
+    return list;
+}
+
 }  // namespace
 
 std::string ServeCatalog(binding::RequestContext& context, int version, const std::string& method) {
@@ -62,6 +76,8 @@ std::string ServeCatalog(binding::RequestContext& context, int version, const st
         data["group"] = Groups(context);
     } else if (version == 1 && method == "Mounts") {
         data["mount"] = Mounts(context);
+    } else if (version == 1 && method == "Emaps") {
+        data["emap"] = Emaps(context);
     } else {
         throw Failure(404, "no such api, version or method");
     }

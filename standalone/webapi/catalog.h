@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The host's own API VEXO.Catalog: the camera groups and mounts that the caller may see. Runs in a request process.
+// The host's own API VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see. Runs in a request process.
 #pragma once
 
 #include <string>

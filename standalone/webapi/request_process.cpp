@@ -18,6 +18,7 @@
 #include "standalone/webapi/answer.h"
 #include "standalone/webapi/auth.h"
 #include "standalone/webapi/catalog.h"
+#include "standalone/webapi/emap.h"
 #include "standalone/webapi/event.h"
 #include "standalone/webapi/parameters.h"
 #include "standalone/webapi/picture.h"
@@ -106,6 +107,10 @@ const OwnApi kOwnApis[] = {
     {kCatalogApi,
      [](const RequestTask&, const ScgiRequest&, int version, const VEXO::APIRequest::Context& asked) {
          return ServeCatalog(RequestContext::Current(), version, asked.method);
+     }},
+    {kEmapApi,
+     [](const RequestTask&, const ScgiRequest& request, int version, const VEXO::APIRequest::Context& asked) {
+         return ServeEmap(RequestContext::Current(), request, version, asked.method, asked.parameters);
      }},
 };
 

@@ -1,0 +1,197 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/webapi/emap.h"
+
+#include <algorithm>
+
+#include "standalone/base/clock.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/devices.h"
+#include "standalone/store/emap_json.h"
+#include "standalone/store/emaps.h"
+#include "standalone/store/servers.h"
+#include "standalone/webapi/answer.h"
+
+namespace lookhaven::webapi {
+
+namespace {
+
+using store::DeniableItem;
+using store::EmapItemType;
+
+void RequireManager() {
+    if (!binding::IsManager()) {
+        throw Failure(403, "only those who administer the host may do this");
+    }
+}
+
+store::Emap FindVisible(binding::RequestContext& context, const Parameters& parameters) {
+    const int id = Find(parameters, "emap").asInt();
+    const auto emap = store::Emaps(context.Records()).Find(id);
+    if (!emap || !binding::MaySee(DeniableItem::kEmap, id)) {
+        throw Failure(404, "there is no such e-map");
+    }
+    return *emap;
+}
+
+std::string Items(binding::RequestContext& context, const Parameters& parameters) {
+    const store::Emap emap = FindVisible(context, parameters);
+    Json::Value data;
+    data["id"] = emap.id;
+    data["name"] = emap.name;
+    data["revision"] = emap.revision;
+    data["hideItemName"] = emap.hide_names;
+    data["smallItemSize"] = emap.small_items;
+    data["items"] = store::ToJson(store::Emaps(context.Records()).Items(emap.id));
+    return SuccessAnswer(data);
+}
+
+std::string SaveItems(binding::RequestContext& context, const Parameters& parameters) {
+    store::Emap emap = FindVisible(context, parameters);
+    emap.revision = Find(parameters, "revision").asInt();
+    if (const Json::Value hide = Find(parameters, "hideItemName"); !hide.isNull()) {
+        emap.hide_names = hide.asBool();
+    }
+    if (const Json::Value small = Find(parameters, "smallItemSize"); !small.isNull()) {
+        emap.small_items = small.asBool();
+    }
+    Json::Value data;
+    data["revision"] =
+        store::Emaps(context.Records()).ReplaceItems(emap, store::EmapItemsFromJson(Find(parameters, "items")));
+    return SuccessAnswer(data);
+}
+
+Json::Value& AppendNamed(Json::Value& list, int id, const std::string& name, int server_id, int id_on_server) {
+    Json::Value& json = list.append(Json::objectValue);
+    json["id"] = id;
+    json["name"] = name;
+    json["hxId"] = server_id;
+    json["idOnRec"] = id_on_server;
+    return json;
+}
+
+Json::Value CameraList(store::Store& records) {
+    Json::Value list(Json::arrayValue);
+    std::map<int, store::PortCounts> ports = store::Devices(records).CameraPorts();
+    const auto append = [&](int id, const std::string& name, int server_id, int id_on_server) {
+        Json::Value& json = AppendNamed(list, id, name, server_id, id_on_server);
+        json["inputs"] = ports[id].inputs;
+        json["outputs"] = ports[id].outputs;
+    };
+    for (const store::Camera& camera : store::Cameras(records).List()) {
+        append(camera.id, camera.name, 0, camera.id);
+    }
+    for (const store::RemoteCamera& camera : store::RecordingServers(records).ListCameras()) {
+        append(camera.id, camera.name, camera.server_id, camera.id_on_server);
+    }
+    return list;
+}
+
+Json::Value DeviceList(store::Store& records, EmapItemType kind) {
+    Json::Value list(Json::arrayValue);
+    for (const store::Device& device : store::Devices(records).List(kind)) {
+        Json::Value& json = AppendNamed(list, device.id, device.name, device.server_id, device.id_on_server);
+        json["camera"] = device.camera_id;
+        json["port"] = Json::arrayValue;
+        for (const auto& [index, port] : device.ports) {
+            Json::Value& described = json["port"].append(Json::objectValue);
+            described["idx"] = index;
+            described["type"] = static_cast<int>(port.type);
+            described["camera"] = port.camera_id;
+        }
+    }
+    return list;
+}
+
+// What may be placed on a map.
+std::string Devices(binding::RequestContext& context) {
+    store::Store& records = context.Records();
+    Json::Value data;
+    data["camera"] = CameraList(records);
+    data["emap"] = Json::arrayValue;
+    for (const store::Emap& emap : store::Emaps(records).List()) {
+        AppendNamed(data["emap"], emap.id, emap.name, 0, emap.id);
+    }
+    data["door"] = DeviceList(records, EmapItemType::kDoor);
+    data["io"] = DeviceList(records, EmapItemType::kIoModule);
+    data["pos"] = DeviceList(records, EmapItemType::kPos);
+    return SuccessAnswer(data);
+}
+
+bool IsOnMap(const std::vector<store::EmapItem>& items, const store::Device& device) {
+    return std::any_of(items.begin(), items.end(), [&device](const store::EmapItem& item) {
+        return item.type == device.kind && item.server_id == device.server_id && item.device_id == device.id_on_server;
+    });
+}
+
+std::string States(binding::RequestContext& context, const Parameters& parameters) {
+    const std::vector<store::EmapItem> items =
+        store::Emaps(context.Records()).Items(FindVisible(context, parameters).id);
+    store::Devices devices(context.Records());
+    Json::Value data;
+    data["door"] = data["io"] = Json::arrayValue;
+    for (const store::DeviceState& state : devices.States()) {
+        const bool is_door = state.kind == EmapItemType::kDoor;
+        const auto device = devices.Find(state.kind, state.id);
+        if (!device || !IsOnMap(items, *device) ||
+            !binding::MaySee(is_door ? DeniableItem::kDoor : DeniableItem::kIoModule, state.id)) {
+            continue;
+        }
+        Json::Value& json = data[is_door ? "door" : "io"].append(Json::objectValue);
+        json["id"] = device->id_on_server;
+        json["hxId"] = device->server_id;
+        json["portIdx"] = state.port;
+        json["state"] = state.state;
+        json["since"] = Json::Int64{state.since_s};
+    }
+    return SuccessAnswer(data);
+}
+
+std::string Report(binding::RequestContext& context, const Parameters& parameters) {
+    const Json::Value kind = Find(parameters, "kind");
+    if (kind != "door" && kind != "io") {
+        throw Failure(400, "kind must be door or io");
+    }
+    const Json::Value port = Find(parameters, "portIdx");
+    store::Devices(context.Records())
+        .Report({kind == "door" ? EmapItemType::kDoor : EmapItemType::kIoModule, Find(parameters, "id").asInt(),
+                 port.isNull() ? -1 : port.asInt(), Find(parameters, "state").asString(), base::WallMillis() / 1000});
+    return SuccessAnswer(Json::objectValue);
+}
+
+std::string Change(binding::RequestContext& context, const ScgiRequest& request, const Parameters& parameters,
+                   std::string (*change)(binding::RequestContext&, const Parameters&)) {
+    RequirePost(request);
+    RequireManager();
+    try {
+        return change(context, parameters);
+    } catch (const store::InvalidRecord& error) {
+        throw Failure(400, error.what());
+    } catch (const store::NotFound& error) {
+        throw Failure(404, error.what());
+    } catch (const store::Conflict& error) {
+        throw Failure(409, error.what());
+    }
+}
+
+}  // namespace
+
+std::string ServeEmap(binding::RequestContext& context, const ScgiRequest& request, int version,
+                      const std::string& method, const Parameters& parameters) {
+    if (version == 1 && method == "States") {
+        return States(context, parameters);
+    }
+    if (version == 1 && method == "SaveItems") {
+        return Change(context, request, parameters, SaveItems);
+    }
+    if (version == 1 && method == "Report") {
+        return Change(context, request, parameters, Report);
+    }
+    if (version == 1 && (method == "Items" || method == "Devices")) {
+        RequireManager();
+        return method == "Items" ? Items(context, parameters) : Devices(context);
+    }
+    throw Failure(404, "no such api, version or method");
+}
+
+}  // namespace lookhaven::webapi
