@@ -11,6 +11,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_options.h"
 #include "standalone/media/probe.h"
+#include "standalone/store/devices.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::cli {
@@ -29,6 +30,7 @@ struct Request {
     int id = 0;
     std::string target;  // of a probe: an id or an address
     std::optional<std::string> account;
+    store::PortCounts ports;
     CameraOptions options;
     RecordingOptions recording;
 };
@@ -188,6 +190,18 @@ void Remove(const Console& console, const Request& request) {
     console.Answer("The camera " + std::to_string(request.id) + " is gone; its recordings stay.", data);
 }
 
+void SetPorts(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    store::Devices(store).SetCameraPorts(request.id, request.ports);
+    Json::Value data;
+    data["id"] = request.id;
+    data["inputs"] = request.ports.inputs;
+    data["outputs"] = request.ports.outputs;
+    console.Answer("The camera " + std::to_string(request.id) + " has " + std::to_string(request.ports.inputs) +
+                       " inputs and " + std::to_string(request.ports.outputs) + " outputs.",
+                   data);
+}
+
 std::optional<int> AsId(const std::string& text) {
     int id = 0;
     const char* end = text.data() + text.size();
@@ -265,6 +279,11 @@ void AddCamera(CLI::App& program, Console& console) {
 
     group->add_subcommand("list", "Lists the cameras")->callback([&console] { List(console); });
     command("remove", "Removes a camera", Remove)->add_option("id", request->id, "The camera's id")->required();
+
+    CLI::App* ports = command("ports", "Says how many digital inputs and outputs a camera has", SetPorts);
+    ports->add_option("id", request->id, "The camera's id")->required();
+    ports->add_option("--inputs", request->ports.inputs, "How many inputs (else none)");
+    ports->add_option("--outputs", request->ports.outputs, "How many outputs (else none)");
 
     CLI::App* probe = command("probe", "Opens a source and says what it sends", ShowProbe);
     probe->add_option("target", request->target, "A camera's id, or an address")->required();

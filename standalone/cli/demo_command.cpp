@@ -1,12 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven demo: cameras of test patterns, recorded and grouped, a viewer, and events by the thousand, to try everything
+// lookhaven demo: cameras of test patterns, recorded and grouped, floor plans, a viewer, and events by the thousand, to try everything
 // without a camera.
 #include <algorithm>
 #include <memory>
 
 #include "standalone/base/clock.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/demo_emaps.h"
 #include "standalone/cli/demo_events.h"
 #include "standalone/cli/demo_footage.h"
 #include "standalone/store/events.h"
@@ -96,8 +97,10 @@ void Setup(const Console& console) {
     int added = 0;
     int denied = 0;
     std::vector<int> recorded;
+    std::map<std::string, int> ids;
     for (const Camera& wanted : DemoCameras()) {
         const int id = AddMissing(cameras, wanted, known, added);
+        ids[wanted.name] = id;
         denied = wanted.name == kDeniedCamera ? id : denied;
         if (recorded.size() < kRecordedCameras) {
             recorded.push_back(id);
@@ -110,11 +113,13 @@ void Setup(const Console& console) {
     if (viewer_missing) {
         users.Deny(users.Add(kViewer, password, store::Privilege::kViewer).id, denied);
     }
+    const int maps = AddDemoEmaps(store, console.Installation().Home(), ids, users.FindByName(kViewer)->id);
     Json::Value data;
     data["cameras_added"] = added;
     data["viewer_added"] = viewer_missing;
-    console.Answer("The demo is set up: " + std::to_string(added) + " cameras were added" +
-                       (viewer_missing ? ", and the account viewer." : "."),
+    data["emaps_added"] = maps;
+    console.Answer("The demo is set up: " + std::to_string(added) + " cameras and " + std::to_string(maps) +
+                       " e-maps were added" + (viewer_missing ? ", and the account viewer." : "."),
                    data);
 }
 

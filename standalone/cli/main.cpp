@@ -74,6 +74,8 @@ int Run(int argc, char** argv) {
     AddGroup(program, console);
     AddMount(program, console);
     AddEvent(program, console);
+    AddEmap(program, console);
+    AddDevices(program, console);
     AddSetting(program, console);
     AddVerify(program, console);
     AddDemo(program, console);

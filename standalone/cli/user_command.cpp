@@ -8,6 +8,7 @@
 
 #include "standalone/cli/commands.h"
 #include "standalone/store/cameras.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::cli {
@@ -15,6 +16,7 @@ namespace lookhaven::cli {
 namespace {
 
 using store::CameraAccess;
+using store::DeniableItem;
 using store::Privilege;
 using store::User;
 using store::Users;
@@ -24,11 +26,23 @@ const std::map<std::string, Privilege> kPrivileges = {
 const std::map<std::string, CameraAccess> kAccess = {
     {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
 
+struct ItemKind {
+    DeniableItem kind;
+    const char* option;
+    const char* name;
+    const char* key;
+};
+
+constexpr ItemKind kItems[] = {{DeniableItem::kEmap, "--emap", "e-map", "denied_emaps"},
+                               {DeniableItem::kDoor, "--door", "door", "denied_doors"},
+                               {DeniableItem::kIoModule, "--io", "I/O module", "denied_io_modules"}};
+
 struct Request {
     std::string name;
     Privilege privilege = Privilege::kViewer;
     std::optional<int> camera;
     std::optional<int> group;
+    std::map<DeniableItem, int> items;  // at most one is taken
     std::vector<CameraAccess> kinds;
 };
 
@@ -75,16 +89,32 @@ std::string DeniedText(Users& users, int user, std::set<int> (Users::*denied)(in
     return text;
 }
 
+// "e-map 1 2; door 4"
+std::string DeniedItemsText(Users& users, int user, Json::Value& data) {
+    std::string text;
+    for (const ItemKind& kind : kItems) {
+        data[kind.key] = Json::arrayValue;
+        std::string ids;
+        for (const int id : users.DeniedItems(user, kind.kind)) {
+            data[kind.key].append(id);
+            ids += " " + std::to_string(id);
+        }
+        text += ids.empty() ? "" : (text.empty() ? "" : "; ") + (kind.name + ids);
+    }
+    return text;
+}
+
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     Users users(store);
     Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "privilege", "denied cameras", "denied groups"}};
+    Rows rows = {{"id", "name", "privilege", "denied cameras", "denied groups", "denied else"}};
     for (const User& user : users.List()) {
         Json::Value entry = ToData(user);
         rows.push_back({std::to_string(user.id), user.name, PrivilegeName(user.privilege),
                         DeniedText(users, user.id, &Users::DeniedCameras, entry["denied"]),
-                        DeniedText(users, user.id, &Users::DeniedGroups, entry["denied_groups"])});
+                        DeniedText(users, user.id, &Users::DeniedGroups, entry["denied_groups"]),
+                        DeniedItemsText(users, user.id, entry)});
         data.append(entry);
     }
     console.Answer(Table(rows), data);
@@ -120,28 +150,54 @@ void PermitKind(Users& users, int user, const Request& request, bool allow, Came
     }
 }
 
+void RequireCamera(store::Store& store, int id) {
+    if (!store::Cameras(store).Find(id) && !store::RecordingServers(store).FindCamera(id)) {
+        throw Failure(kNoInput, "there is no camera " + std::to_string(id) + ": lookhaven camera list names them");
+    }
+}
+
+// Of a camera or group; the sentence's rest.
+std::string PermitCamera(store::Store& store, int user, const Request& request, bool allow) {
+    if (!allow && request.camera) {
+        RequireCamera(store, *request.camera);
+    }
+    Users users(store);
+    bool still_denied = false;
+    for (const CameraAccess kind : request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds) {
+        PermitKind(users, user, request, allow, kind);
+        still_denied =
+            still_denied || (allow && request.camera && users.DeniedCameras(user, kind).contains(*request.camera));
+    }
+    return still_denied ? ", but belongs to a group that is denied." : ".";
+}
+
+std::string Subject(const Request& request) {
+    for (const ItemKind& kind : kItems) {
+        if (const auto item = request.items.find(kind.kind); item != request.items.end()) {
+            return kind.name + std::string(" ") + std::to_string(item->second);
+        }
+    }
+    return request.group ? "group " + std::to_string(*request.group) : "camera " + std::to_string(*request.camera);
+}
+
 void Permit(const Console& console, const Request& request, bool allow) {
-    if (request.camera.has_value() == request.group.has_value()) {
-        throw Failure(kUsage, "name either a camera or a group: see lookhaven user deny --help");
+    if ((request.camera ? 1U : 0U) + (request.group ? 1U : 0U) + request.items.size() != 1) {
+        throw Failure(kUsage, "name one camera, group, e-map, door or I/O module: see lookhaven user deny --help");
+    }
+    if (!request.items.empty() && !request.kinds.empty()) {
+        throw Failure(kUsage, "a kind of access is one to cameras and groups: leave --kind out");
     }
     store::Store store = console.OpenStore();
     Users users(store);
     const User user = Require(users, request.name);
-    if (!allow && request.camera && !store::Cameras(store).Find(*request.camera)) {
-        throw Failure(kNoInput,
-                      "there is no camera " + std::to_string(*request.camera) + ": lookhaven camera list names them");
+    std::string rest = ".";
+    if (request.items.empty()) {
+        rest = PermitCamera(store, user.id, request, allow);
+    } else {
+        const auto [kind, item] = *request.items.begin();
+        allow ? users.AllowItem(user.id, kind, item) : users.DenyItem(user.id, kind, item);
     }
-    const std::vector<CameraAccess> kinds = request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds;
-    bool still_denied = false;
-    for (const CameraAccess kind : kinds) {
-        PermitKind(users, user.id, request, allow, kind);
-        still_denied =
-            still_denied || (allow && request.camera && users.DeniedCameras(user.id, kind).contains(*request.camera));
-    }
-    const std::string subject =
-        request.group ? "group " + std::to_string(*request.group) : "camera " + std::to_string(*request.camera);
-    console.Answer("The " + subject + (allow ? " is allowed to " : " is denied to ") + user.name +
-                       (still_denied ? ", but belongs to a group that is denied." : "."),
+    console.Answer("The " + Subject(request) + (allow ? " is allowed to " : " is denied to ") + user.name + rest,
                    ToData(user));
 }
 
@@ -161,12 +217,17 @@ void AddUser(CLI::App& program, Console& console) {
     group->add_subcommand("list", "Lists the accounts")->callback([&console] { List(console); });
     command("passwd", "Changes a password and ends the account's sessions", SetPassword);
     command("remove", "Removes an account and ends its sessions", Remove);
-    for (CLI::App* permit : {command("deny", "Denies a camera or group and ends the account's sessions",
-                                     [](const Console&c, const Request&r) { Permit(c, r, false); }),
-                             command("allow", "Allows a camera or group again",
-                                     [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
+    for (CLI::App* permit :
+         {command("deny", "Denies one thing and ends the account's sessions",
+                  [](const Console&c, const Request&r) { Permit(c, r, false); }),
+          command("allow", "Allows it again", [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
         permit->add_option("camera", request->camera, "The camera's id");
         permit->add_option("--group", request->group, "A group's id instead: all that its cameras are and will be");
+        for (const ItemKind& kind : kItems) {
+            permit->add_option_function<int>(
+                kind.option, [request, &kind](int id) { request->items[kind.kind] = id; },
+                std::string("An id instead: ") + kind.name);
+        }
         Choose(permit->add_option("--kind", request->kinds, "What exactly; may be repeated (else everything)"), kAccess)
             ->allow_extra_args(false);
     }

@@ -93,14 +93,19 @@ const char* DeviceQuery(const EmapItem& item) {
     }
 }
 
-void RequireDevice(soci::session& sql, const EmapItem& item) {
+bool HasDevice(soci::session& sql, const EmapItem& item) {
     int found = 0;
     const int kind = static_cast<int>(item.type);
     sql << DeviceQuery(item), soci::use(item.device_id, "id"), soci::use(item.server_id, "server"),
         soci::use(kind, "kind"), soci::into(found);
-    if (!sql.got_data()) {
+    return sql.got_data();
+}
+
+void RequireDevice(soci::session& sql, const EmapItem& item) {
+    if (!HasDevice(sql, item)) {
         constexpr const char* kNames[] = {"camera", "e-map", "door", "I/O module", "POS terminal"};
-        throw NotFound(std::string("there is no ") + kNames[kind] + " " + std::to_string(item.device_id) +
+        throw NotFound(std::string("there is no ") + kNames[static_cast<int>(item.type)] + " " +
+                       std::to_string(item.device_id) +
                        (item.server_id == 0 ? "" : " on server " + std::to_string(item.server_id)));
     }
 }
@@ -206,6 +211,10 @@ std::vector<EmapSummary> Emaps::List() {
 
 std::vector<EmapItem> Emaps::Items(int id) {
     return connection_.Read([&](soci::session& sql) { return FetchItems(sql, id); });
+}
+
+bool Emaps::Knows(const EmapItem& item) {
+    return connection_.Read([&](soci::session& sql) { return HasDevice(sql, item); });
 }
 
 int Emaps::ReplaceItems(const Emap& emap, const std::vector<EmapItem>& items) {
