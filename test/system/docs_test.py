@@ -49,7 +49,8 @@ class DocsTest(unittest.TestCase):
                     # A session that an example may end, but not so many log-ins that the host refuses one.
                     log_in = server.login if page.name == "auth.md" else server.session
                     headers = {"Cookie": f"id={log_in(account)}"} if account else {}
-                    headers["Content-Type"] = "application/x-www-form-urlencoded"
+                    form = "json" if body.startswith("{") else "x-www-form-urlencoded"
+                    headers["Content-Type"] = f"application/{form}"
                     with self.subTest(page=page.name, request=line), contextlib.ExitStack() as running:
                         ran += 1
                         if player:
