@@ -3,6 +3,7 @@
 # Finds the libraries that we build on; docs/design/dependencies.md says why each.
 find_package(PkgConfig REQUIRED)
 find_package(Threads REQUIRED)
+find_package(OpenSSL REQUIRED)
 pkg_check_modules(jsoncpp REQUIRED IMPORTED_TARGET jsoncpp)
 pkg_check_modules(sodium REQUIRED IMPORTED_TARGET libsodium)
 pkg_check_modules(turbojpeg REQUIRED IMPORTED_TARGET libturbojpeg)

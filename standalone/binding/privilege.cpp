@@ -2,8 +2,8 @@
 //
 // Privilege profiles: what a user may not see, read from the store and narrowed by what a relaying host sends along.
 //
-// Format        {"privilege": 2, "deniedCameras": [3, 7]}; both may be missing. A denied camera is denied for every kind
-//               of access.
+// Format        {"privilege": 2, "deniedCameras": [3, 7], "deniedAudio": [4]}; each may be missing. A denied camera is denied
+//               for every kind of access.
 #include <algorithm>
 #include <map>
 
@@ -23,20 +23,33 @@ static_assert(store::kPeerUserId == PAIR_AUTH_UID);
 
 namespace lookhaven::binding {
 
-std::set<int> CamerasDeniedBy(const Json::Value& priv_data) {
+namespace {
+
+std::set<int> IdsUnder(const Json::Value& priv_data, const char* member) {
     std::set<int> cameras;
     if (!priv_data.isNull()) {
-        for (const Json::Value& camera : priv_data.get("deniedCameras", Json::arrayValue)) {
+        for (const Json::Value& camera : priv_data.get(member, Json::arrayValue)) {
             cameras.insert(camera.asInt());
         }
     }
     return cameras;
 }
 
+}  // namespace
+
+std::set<int> CamerasDeniedBy(const Json::Value& priv_data) {
+    return IdsUnder(priv_data, "deniedCameras");
+}
+
+std::set<int> SoundDeniedBy(const Json::Value& priv_data) {
+    return IdsUnder(priv_data, "deniedAudio");
+}
+
 bool MayUse(int camera, store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     const unsigned int caller = context.Caller();
-    if (caller == 0 || context.RenouncedCameras().contains(camera)) {
+    if (caller == 0 || context.RenouncedCameras().contains(camera) ||
+        (kind == store::CameraAccess::kAudio && context.RenouncedSound().contains(camera))) {
         return false;
     }
     if (caller == PAIR_AUTH_UID) {
@@ -142,6 +155,7 @@ void PrivProfile::UpdateByJson(const Json::Value& privData) {
             narrowed->denied_cameras[static_cast<int>(kind)].insert(camera);
         }
     }
+    narrowed->denied_cameras[CAM_PRIV_AUDIO].merge(lookhaven::binding::SoundDeniedBy(privData));
     m_pData = std::move(narrowed);
 }
 

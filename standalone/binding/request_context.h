@@ -58,9 +58,13 @@ class LH_PLATFORM_API RequestContext {
     // The handle of the caller's session; empty when there is none.
     const std::string& Session() const { return session_; }
     void SetSession(const std::string& handle) { session_ = handle; }
-    // Cameras that the request itself gives up, whatever the caller may see.
+    // Cameras that the request itself gives up, whatever the caller may see, and such whose sound alone it gives up.
     const std::set<int>& RenouncedCameras() const { return renounced_cameras_; }
-    void Renounce(std::set<int> cameras) { renounced_cameras_ = std::move(cameras); }
+    const std::set<int>& RenouncedSound() const { return renounced_sound_; }
+    void Renounce(std::set<int> cameras, std::set<int> sound = {}) {
+        renounced_cameras_ = std::move(cameras);
+        renounced_sound_ = std::move(sound);
+    }
 
     // The live stream that the caller was found to be allowed, and whether its sound is too.
     const std::optional<ring::LiveStream>& GrantedStream() const { return granted_; }
@@ -89,6 +93,7 @@ class LH_PLATFORM_API RequestContext {
     unsigned int caller_ = 0;
     std::string session_;
     std::set<int> renounced_cameras_;
+    std::set<int> renounced_sound_;
     std::optional<ring::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;

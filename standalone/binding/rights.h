@@ -19,6 +19,9 @@ namespace lookhaven::binding {
 // for another shape than the one in privilege.cpp.
 LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
 
+// Likewise the cameras whose sound alone they deny.
+LH_PLATFORM_API std::set<int> SoundDeniedBy(const Json::Value& priv_data);
+
 // False for a camera that is denied to the caller or that the request renounces, and for nobody as the caller. Throws
 // store::StoreError.
 LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);

@@ -33,6 +33,7 @@ void AddMount(CLI::App& program, Console& console);
 void AddGroup(CLI::App& program, Console& console);
 void AddEmap(CLI::App& program, Console& console);
 void AddDevices(CLI::App& program, Console& console);
+void AddServer(CLI::App& program, Console& console);
 void AddSetting(CLI::App& program, Console& console);
 void AddVerify(CLI::App& program, Console& console);
 void AddDoctor(CLI::App& program, Console& console);

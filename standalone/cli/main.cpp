@@ -76,6 +76,7 @@ int Run(int argc, char** argv) {
     AddEvent(program, console);
     AddEmap(program, console);
     AddDevices(program, console);
+    AddServer(program, console);
     AddSetting(program, console);
     AddVerify(program, console);
     AddDemo(program, console);

@@ -55,8 +55,9 @@ void RequireValid(soci::session& sql, const RecordingServer& server) {
                                : !IsAddress(server.address) || server.port < 1 || server.port > 65'535) {
         throw InvalidRecord("a server is reached by a host name or address, and a port from 1 to 65535");
     }
-    if (!server.certificate.empty() && !IsCertificate(server.certificate)) {
-        throw InvalidRecord("a server's certificate is one in PEM, of up to 16384 bytes");
+    if (server.address.empty() != server.certificate.empty() ||
+        (!server.certificate.empty() && !IsCertificate(server.certificate))) {
+        throw InvalidRecord("a server that has an address has a certificate in PEM, of up to 16384 bytes");
     }
     int found = 0;
     sql << "select id from servers where name = :name and id <> :id", soci::use(server.name, "name"),

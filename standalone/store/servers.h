@@ -17,7 +17,7 @@ struct RecordingServer {
     std::string name = {};         // UTF-8, 1 to 64 bytes, no other server's
     std::string address = {};      // a host name or address; empty when only that host asks this one
     int port = 0;                  // of its web server; 0 with an empty address
-    std::string certificate = {};  // PEM, what its web server must show; empty: plain HTTP
+    std::string certificate = {};  // PEM, what its web server must show; given with an address
     bool enabled = true;
 };
 

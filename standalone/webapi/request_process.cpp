@@ -23,6 +23,7 @@
 #include "standalone/webapi/parameters.h"
 #include "standalone/webapi/picture.h"
 #include "standalone/webapi/playback.h"
+#include "standalone/webapi/relay.h"
 
 namespace lookhaven::webapi {
 
@@ -108,6 +109,10 @@ const OwnApi kOwnApis[] = {
      [](const RequestTask&, const ScgiRequest&, int version, const VEXO::APIRequest::Context& asked) {
          return ServeCatalog(RequestContext::Current(), version, asked.method);
      }},
+    {kRelayApi,
+     [](const RequestTask&, const ScgiRequest&, int version, const VEXO::APIRequest::Context& asked) {
+         return ServeRelay(RequestContext::Current(), version, asked.method, asked.parameters);
+     }},
     {kEmapApi,
      [](const RequestTask&, const ScgiRequest& request, int version, const VEXO::APIRequest::Context& asked) {
          return ServeEmap(RequestContext::Current(), request, version, asked.method, asked.parameters);
@@ -121,7 +126,8 @@ void Admit(const RequestTask& task, const ScgiRequest& request, const std::strin
     asked.cookies = ReadCookies(request);
     asked.remote_ip = request.Header("REMOTE_ADDR");
     asked.login = FindLogin(context, asked.cookies);
-    context.Renounce(binding::CamerasDeniedBy(Find(asked.parameters, "privData")));
+    const Json::Value renounced = Find(asked.parameters, "privData");
+    context.Renounce(binding::CamerasDeniedBy(renounced), binding::SoundDeniedBy(renounced));
     if (!asked.login) {
         if (api != kSelfAdmittingApi) {
             throw Failure(401, "no session");

@@ -209,6 +209,10 @@ class Installation:
             self._sessions[account] = self.login(account)
         return self._sessions[account]
 
+    def forget_sessions(self):
+        """Each account logs in anew when it is next used: a right that is lost ended its sessions."""
+        self._sessions.clear()
+
     def live(self, camera, account="admin", **parameters):
         """A live stream as a Parts; the caller closes it."""
         query = {"api": LIVE, "version": 1, "method": "Play", "camera": camera, **parameters}

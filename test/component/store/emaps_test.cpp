@@ -22,13 +22,14 @@ using testing::IsEmpty;
 using testing::SizeIs;
 
 const std::string kSecret(64, 'a');
+const std::string kCertificate = "-----BEGIN CERTIFICATE-----\nAA==\n-----END CERTIFICATE-----\n";
 
 class EmapTest : public StoreTest {
   protected:
     int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
     int AddMap(const std::string& name) { return emaps_.Add({.name = name}); }
     int AddServer(const std::string& name = "Annex") {
-        return servers_.Add({.name = name, .address = "192.0.2.7", .port = 8443}, kSecret);
+        return servers_.Add({.name = name, .address = "192.0.2.7", .port = 8443, .certificate = kCertificate}, kSecret);
     }
     // What a change of all items made of it.
     int Replace(int id, std::vector<EmapItem> items) { return emaps_.ReplaceItems(*emaps_.Find(id), items); }
@@ -254,16 +255,21 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     changed.enabled = true;
     servers_.Update(changed);
     EXPECT_EQ(servers_.FindSecret(server), std::string(64, 'b')) << "kept where none is given";
-    const RecordingServer good{.name = "B", .address = "nvr.example", .port = 1};
+    const RecordingServer good{.name = "B", .address = "nvr.example", .port = 1, .certificate = kCertificate};
     for (const std::string& secret : {std::string(), std::string(63, 'a'), std::string(64, 'g')}) {
         EXPECT_THROW(servers_.Add(good, secret), InvalidRecord) << secret;
     }
     for (const char* address : {"a b", "a;b", "a/b", "a}b", "a\n", "-a", "a$b"}) {
-        EXPECT_THROW(servers_.Add({.name = "B", .address = address, .port = 1}, kSecret), InvalidRecord) << address;
+        EXPECT_THROW(servers_.Add({.name = "B", .address = address, .port = 1, .certificate = kCertificate}, kSecret),
+                     InvalidRecord)
+            << address;
     }
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 65536}, kSecret), InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 0}, kSecret), InvalidRecord);
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 65536, .certificate = kCertificate}, kSecret),
+                 InvalidRecord);
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 0, .certificate = kCertificate}, kSecret),
+                 InvalidRecord);
     EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1, .certificate = "x"}, kSecret), InvalidRecord);
+    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1}, kSecret), InvalidRecord) << "in the clear";
     EXPECT_THROW(AddServer(), AlreadyExists);
     const int id = servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "Old"});
     EXPECT_EQ(servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "New"}), id);

@@ -31,6 +31,7 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 
 const std::string kSecret(64, 'c');
+const std::string kCertificate = "-----BEGIN CERTIFICATE-----\nAA==\n-----END CERTIFICATE-----\n";
 
 // A managing host with a server "Annex" (1), whose camera 1 is camera 2 here, and a map (1).
 class EmapBinding : public testing::Test {
@@ -43,7 +44,7 @@ class EmapBinding : public testing::Test {
         users.DenyItem(2, DeniableItem::kDoor, 4);
         users.DenyItem(2, DeniableItem::kIoModule, 5);
         store::Cameras(records_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
-        servers_.Add({.name = "Annex", .address = "192.0.2.7", .port = 8080}, kSecret);
+        servers_.Add({.name = "Annex", .address = "192.0.2.7", .port = 8080, .certificate = kCertificate}, kSecret);
         servers_.PutCamera({.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = store::VideoType::kH264});
         emaps_.Add({.name = "Ground floor"});
         Call(1);

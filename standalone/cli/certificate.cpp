@@ -1,0 +1,90 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/cli/certificate.h"
+
+#include <memory>
+#include <optional>
+
+#include <openssl/pem.h>
+#include <openssl/x509v3.h>
+
+#include "standalone/cli/console.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+using Bio = std::unique_ptr<BIO, decltype(&BIO_free_all)>;
+using Certificate = std::unique_ptr<X509, decltype(&X509_free)>;
+using Names = std::unique_ptr<GENERAL_NAMES, decltype(&GENERAL_NAMES_free)>;
+
+// Null at the end.
+Certificate ReadNext(const Bio& bio) {
+    return {PEM_read_bio_X509(bio.get(), nullptr, nullptr, nullptr), X509_free};
+}
+
+Bio Open(const std::string& pem) {
+    return {BIO_new_mem_buf(pem.data(), static_cast<int>(pem.size())), BIO_free_all};
+}
+
+Certificate RequireFirst(const Bio& bio) {
+    Certificate certificate = ReadNext(bio);
+    if (!certificate) {
+        throw Failure(kDataError, "there is no certificate in PEM");
+    }
+    return certificate;
+}
+
+std::string TextOf(const ASN1_STRING* text) {
+    return {reinterpret_cast<const char*>(ASN1_STRING_get0_data(text)),
+            static_cast<std::size_t>(ASN1_STRING_length(text))};
+}
+
+std::optional<std::string> FirstDnsName(const X509* certificate) {
+    const Names names(
+        static_cast<GENERAL_NAMES*>(X509_get_ext_d2i(certificate, NID_subject_alt_name, nullptr, nullptr)),
+        GENERAL_NAMES_free);
+    for (int i = 0; names && i < sk_GENERAL_NAME_num(names.get()); ++i) {
+        const GENERAL_NAME* name = sk_GENERAL_NAME_value(names.get(), i);
+        if (name->type == GEN_DNS) {
+            return TextOf(name->d.dNSName);
+        }
+    }
+    return std::nullopt;
+}
+
+std::string CommonName(const X509* certificate) {
+    X509_NAME* subject = X509_get_subject_name(certificate);
+    const int at = X509_NAME_get_index_by_NID(subject, NID_commonName, -1);
+    return at < 0 ? "" : TextOf(X509_NAME_ENTRY_get_data(X509_NAME_get_entry(subject, at)));
+}
+
+}  // namespace
+
+std::string CertificatesIn(const std::string& pem) {
+    const Bio in = Open(pem);
+    const Bio out(BIO_new(BIO_s_mem()), BIO_free_all);
+    for (Certificate certificate = RequireFirst(in); certificate; certificate = ReadNext(in)) {
+        if (!out || PEM_write_bio_X509(out.get(), certificate.get()) != 1) {
+            throw std::bad_alloc();
+        }
+    }
+    char* text = nullptr;
+    const long size = BIO_get_mem_data(out.get(), &text);
+    return {text, static_cast<std::size_t>(size)};
+}
+
+std::string CertificateName(const std::string& pem) {
+    const Certificate certificate = RequireFirst(Open(pem));
+    std::string name = FirstDnsName(certificate.get()).value_or(CommonName(certificate.get()));
+    if (name.starts_with("*.")) {
+        name.replace(0, 1, "host");
+    }
+    // The name becomes a part of the web server's configuration.
+    if (name.empty() || name.size() > 253 ||
+        name.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789.-_") != name.npos) {
+        throw Failure(kDataError, "the certificate is for no host name");
+    }
+    return name;
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,26 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a recording server hands to a host that is to show its cameras: one line of text, to be carried over by a person.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "standalone/store/servers.h"
+
+namespace lookhaven::cli {
+
+struct PairOffer {
+    std::string address;
+    int port = 0;
+    std::string certificate;  // PEM
+    std::string secret;
+    std::vector<store::RemoteCamera> cameras;  // server_id is 0
+};
+
+std::string ToText(const PairOffer& offer);
+
+// Throws Failure kDataError for any other text.
+PairOffer ParsePairText(const std::string& text);
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/cli/relay_config.h"
+
+#include <cerrno>
+#include <csignal>
+#include <filesystem>
+#include <system_error>
+
+#include "standalone/base/file.h"
+#include "standalone/cli/certificate.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+std::string Location(const store::RecordingServer& server, const fs::path& certificate) {
+    return "location ~ \"^/relay/" + std::to_string(server.id) +
+           "/(?<relay_address>[^/]+)/(?<relay_port>[0-9]+)/[0-9]+$\" {\n"
+           "    internal;\n"
+           "    proxy_pass https://$relay_address:$relay_port/webapi$is_args$args;\n"
+           "    proxy_ssl_trusted_certificate \"" +
+           certificate.string() + "\";\n    proxy_ssl_name " + CertificateName(server.certificate) +
+           ";\n    error_page 401 403 500 502 504 =502 /error/no-server;\n}\n";
+}
+
+// A web server that does not run takes the files when it starts.
+void TellWebServer(const fs::path& pid_file) {
+    try {
+        const int pid = std::stoi(base::ReadFile(pid_file));
+        if (pid > 1) {
+            ::kill(pid, SIGHUP);
+        }
+    } catch (const std::system_error&) {
+    } catch (const std::logic_error&) {
+    }
+}
+
+}  // namespace
+
+void WriteRelayConfig(const base::Installation& installation, const std::vector<store::RecordingServer>& servers) {
+    const fs::path folder = installation.TlsFolder() / "servers";
+    fs::create_directories(folder);
+    std::string config;
+    for (const store::RecordingServer& server : servers) {
+        const fs::path file = folder / (std::to_string(server.id) + ".pem");
+        if (server.enabled && !server.address.empty()) {
+            base::WriteFileAtomically(file, server.certificate);
+            config += Location(server, file);
+        }
+    }
+    base::WriteFileAtomically(installation.RunFolder() / "relay.conf", config);
+    TellWebServer(installation.RunFolder() / "nginx.pid");
+}
+
+}  // namespace lookhaven::cli

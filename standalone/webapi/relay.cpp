@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/webapi/relay.h"
+
+#include <memory>
+
+#include <netdb.h>
+#include <sys/socket.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/pair_token.h"
+#include "standalone/store/servers.h"
+#include "standalone/webapi/answer.h"
+
+namespace lookhaven::webapi {
+
+namespace {
+
+// The web server knows no names, and one that is gone must not keep it from starting: so this process looks them up.
+std::string NumericAddress(const std::string& name) {
+    addrinfo hints{};
+    hints.ai_socktype = SOCK_STREAM;
+    addrinfo* found = nullptr;
+    if (::getaddrinfo(name.c_str(), nullptr, &hints, &found) != 0) {
+        throw Failure(502, "the recording server's name has no address");
+    }
+    const std::unique_ptr<addrinfo, decltype(&::freeaddrinfo)> owned(found, ::freeaddrinfo);
+    char text[NI_MAXHOST];
+    if (::getnameinfo(found->ai_addr, found->ai_addrlen, text, sizeof text, nullptr, 0, NI_NUMERICHOST) != 0) {
+        throw Failure(502, "the recording server's name has no address");
+    }
+    return found->ai_family == AF_INET6 ? "[" + std::string(text) + "]" : text;
+}
+
+// "&name=number" when it was given.
+std::string Passed(const Parameters& parameters, const char* name) {
+    const Json::Value value = Find(parameters, name);
+    return value.isNull() ? "" : std::string("&") + name + "=" + std::to_string(value.asInt());
+}
+
+std::string Play(binding::RequestContext& context, const Parameters& parameters) {
+    store::RecordingServers servers(context.Records());
+    const int server_id = Find(parameters, "server").asInt();
+    const auto server = servers.Find(server_id);
+    const auto camera = servers.FindCamera(server_id, Find(parameters, "camera").asInt());
+    const std::string secret = servers.FindSecret(server_id);
+    if (!server || !camera || server->address.empty() || secret.empty()) {
+        throw Failure(404, "there is no such camera on a recording server");
+    }
+    if (!binding::MayUse(camera->id, store::CameraAccess::kLive)) {
+        throw Failure(403, "you may not see this camera");
+    }
+    const std::string id = std::to_string(camera->id_on_server);
+    const std::string timestamp = std::to_string(base::WallMillis() / 1000);
+    std::string query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
+                        Passed(parameters, "snapshot") + Passed(parameters, "profileType") +
+                        "&cookie=" + store::MakePairToken(secret, timestamp);
+    if (!binding::MayUse(camera->id, store::CameraAccess::kAudio)) {
+        query += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
+    }
+    return "Status: 200 OK\r\nX-Accel-Redirect: /relay/" + std::to_string(server_id) + "/" +
+           NumericAddress(server->address) + "/" + std::to_string(server->port) + "/" + timestamp + "?" + query +
+           "\r\nContent-Length: 0\r\n\r\n";
+}
+
+}  // namespace
+
+std::string ServeRelay(binding::RequestContext& context, int version, const std::string& method,
+                       const Parameters& parameters) {
+    if (version == 1 && method == "Play") {
+        return Play(context, parameters);
+    }
+    throw Failure(404, "no such api, version or method");
+}
+
+}  // namespace lookhaven::webapi

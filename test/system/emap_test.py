@@ -1,0 +1,116 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# E-maps through the web server: who sees what of them, how they are changed, and pictures that mean harm.
+import json
+import os
+import unittest
+import urllib.request
+
+from api_test import call, play
+from installation import Installation
+
+JSON = {"Content-Type": "application/json"}
+
+
+class EmapTest(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        cls.server = cls.enterClassContext(Installation())
+
+    def command(self, *words):
+        return json.loads(self.server.cli(*words, "--json"))
+
+    def ask(self, method, account="admin", **parameters):
+        return self.server.request(call("VEXO.Emap", method, **parameters), account)
+
+    def save(self, account="admin", **changes):
+        query = call("VEXO.Emap", "SaveItems")
+        return self.server.request(query, account, body=json.dumps(changes), headers=JSON, method="POST")
+
+    def shown(self, emap, account="admin"):
+        return self.server.request(play(emap, itemType=1), account).json["data"]
+
+    def kinds(self, account):
+        return [(item["type"], item["id"]) for item in self.shown(1, account)["items"]]
+
+    def test_each_caller_sees_what_he_may(self):
+        every = [("0", "1"), ("0", "1"), ("0", "2"), ("1", "2"), ("2", "1"), ("2", "2"), ("3", "1"), ("3", "1"), ("4", "1")]
+        self.assertEqual(self.kinds("admin"), every)
+        self.assertEqual(self.kinds("viewer"), [item for item in every if item not in (("0", "2"), ("2", "2"))])
+        states = self.ask("States", "viewer", emap=1).json["data"]
+        self.assertEqual([door["id"] for door in states["door"]], [1])
+        self.command("user", "deny", "viewer", "--emap", "2")
+        self.command("user", "deny", "viewer", "--io", "1")
+        self.server.forget_sessions()
+        self.assertEqual(self.kinds("viewer"), [("0", "1"), ("0", "1"), ("2", "1"), ("4", "1")])
+        self.assertEqual(self.server.request(play(2, itemType=1), "viewer").status, 502)
+        self.assertEqual(self.ask("States", "viewer", emap=2).status, 404)
+        names = self.server.request(call("VEXO.Catalog", "Emaps"), "viewer").json["data"]["emap"]
+        self.assertNotIn(2, [emap["id"] for emap in names])
+
+    def test_a_change_is_shown_and_a_stale_one_is_not_taken(self):
+        before = self.ask("Items", emap=2).json["data"]
+        items = [{**item, "x": 333} for item in before["items"]]
+        saved = self.save(emap=2, revision=before["revision"], items=items, hideItemName=True)
+        self.assertEqual(saved.status, 200, saved.body)
+        self.assertTrue(all(item["x"] == "333" for item in self.shown(2)["items"]))
+        self.assertTrue(self.shown(2)["hideItemName"])
+        revision = saved.json["data"]["revision"]
+        bad = {"type": 0, "id": 1}
+        for what, account, changes, status in [
+            ("stale", "admin", {"revision": before["revision"], "items": items}, 409),
+            ("viewer", "viewer", {"revision": revision, "items": items}, 403),
+            ("nobody", None, {"revision": revision, "items": items}, 401),
+            ("items of another type", "admin", {"revision": revision, "items": 5}, 400),
+            ("no items", "admin", {"revision": revision}, 400),
+            ("unknown device", "admin", {"revision": revision, "items": [{**bad, "id": 99}]}, 404),
+            ("unknown kind", "admin", {"revision": revision, "items": [{**bad, "type": 7}]}, 400),
+            ("fraction", "admin", {"revision": revision, "items": [{**bad, "x": 1.5}]}, 400),
+            ("too far", "admin", {"revision": revision, "items": [{**bad, "x": 2**31}]}, 400),
+            ("long name", "admin", {"revision": revision, "items": [{**bad, "name": "n" * 256}]}, 400),
+            ("too many", "admin", {"revision": revision, "items": [bad] * 1001}, 400),
+        ]:
+            with self.subTest(what=what):
+                self.assertEqual(self.save(account, emap=2, **changes).status, status)
+        self.assertEqual(self.save(emap=99, revision=1, items=[]).status, 404)
+        self.assertEqual(self.ask("SaveItems", emap=2, revision=revision, items="[]").status, 405)
+        self.assertEqual(self.ask("Items", emap=2).json["data"]["revision"], revision)
+
+    def test_states_come_from_reports(self):
+        report = call("VEXO.Emap", "Report")
+        for form, status in [
+            ({"kind": "door", "id": 1, "state": "open"}, 200),
+            ({"kind": "io", "id": 1, "portIdx": 0, "state": "on"}, 200),
+            ({"kind": "io", "id": 1, "state": "on"}, 404),
+            ({"kind": "door", "id": 1, "state": "ajar"}, 400),
+            ({"kind": "camera", "id": 1, "state": "on"}, 400),
+        ]:
+            self.assertEqual(self.server.request(report, "admin", form=form).status, status, form)
+        self.assertEqual(self.server.request(report, "viewer", form={"kind": "door", "id": 1, "state": "open"}).status, 403)
+        states = self.ask("States", emap=1).json["data"]
+        self.assertEqual(states["door"][0]["state"] + states["io"][0]["state"], "openon")
+
+    def test_a_picture_that_is_broken_or_gone_leaves_the_items(self):
+        broken = self.server.home / "broken"
+        broken.write_bytes(b"\x89PNG\r\n\x1a\nand nothing more")
+        made = self.command("emap", "add", "Broken", str(broken))
+        self.command("emap", "item", "add", str(made["id"]), "camera", "1")
+        self.assertEqual(self.shown(made["id"])["emapType"], "png")
+        picture = self.server.home / "emaps" / made["image"]
+        picture.unlink()
+        os.mkfifo(picture)  # would hang whoever opens it to read
+        data = self.shown(made["id"])
+        self.assertEqual((data["emap"], data["emapLength"], data["itemNum"]), ("", "0", 1))
+
+    def test_the_page_may_run_no_script_of_a_picture(self):
+        with urllib.request.urlopen(f"http://127.0.0.1:{self.server.port}/") as page:
+            policy = page.headers["Content-Security-Policy"]
+        self.assertIn("default-src 'self'", policy)
+        self.assertNotIn("unsafe", policy)
+        answer = self.server.request(play(1, itemType=1), "admin")
+        self.assertEqual(answer.headers.get_content_type(), "application/json")
+        self.assertEqual(answer.headers["X-Content-Type-Options"], "nosniff")
+
+
+if __name__ == "__main__":
+    unittest.main()

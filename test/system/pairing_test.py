@@ -1,0 +1,113 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# Two hosts on one machine: one shows the other's cameras.
+import base64
+import hashlib
+import hmac
+import json
+import time
+import unittest
+
+from api_test import call, play
+from installation import Installation, Parts, wait_until
+
+
+class PairingTest(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        cls.owner = cls.enterClassContext(Installation())
+        cls.watcher = cls.enterClassContext(Installation())
+        line = cls.owner.cli("server", "pair", "Watcher", "--address", "localhost", "--port", str(cls.owner.tls_port))
+        cls.secret = json.loads(base64.b64decode(line.strip().split(":", 1)[1]))["secret"]
+        cls.watcher.cli("server", "add", "Owner", text=line)
+        cls.watcher.cli("set", "cms", "on")
+        cls.cameras = {camera["id_on_server"]: camera["id"] for camera in json.loads(cls.watcher.cli("server", "cameras", "--json"))}
+
+    def relay(self, camera, account="admin", **parameters):
+        return self.watcher.request(call("VEXO.Relay", "Play", server=1, camera=camera, **parameters), account)
+
+    def ask_owner(self, cookie, timestamp, **parameters):
+        query = play(1, snapshot=1, client="REC_SERVER", cookie=cookie, **parameters)
+        return self.owner.request(query, headers={"Cookie": f"timestamp={timestamp}"}).status
+
+    def token(self, timestamp, secret=None):
+        message = f"lookhaven pair 1\n{timestamp}".encode()
+        return hmac.new(bytes.fromhex(secret or self.secret), message, hashlib.sha256).hexdigest()
+
+    def relayed_parts(self, camera, account="admin", **parameters):
+        return Parts(*self.watcher.open(call("VEXO.Relay", "Play", server=1, camera=camera, **parameters), account))
+
+    def test_a_snapshot_and_streams_come_through(self):
+        # The first request starts the other host's camera.
+        picture = wait_until(lambda: (a := self.relay(1, snapshot=1)).status == 200 and a, 15, "a relayed snapshot")
+        self.assertTrue(picture.body.startswith(b"\xff\xd8"))
+        with self.relayed_parts(1) as parts:
+            heads = [parts.next()[0] for _ in range(10)]
+        self.assertLess(float(heads[-1]["x-age-ms"]), 1000)
+        with self.relayed_parts(2) as parts:
+            kinds = {parts.next()[0]["content-type"] for _ in range(40)}
+        self.assertEqual(kinds, {"image/H264", "audio/AAC"})
+        wait_until(lambda: len(self.owner.requests()) <= 1, 5, "the owner's streams end with their viewers")
+
+    def test_the_rights_of_the_host_that_shows_it_count(self):
+        self.watcher.cli("user", "deny", "viewer", str(self.cameras[1]))
+        self.watcher.cli("user", "deny", "viewer", str(self.cameras[2]), "--kind", "audio")
+        self.watcher.forget_sessions()
+        self.assertEqual(self.relay(1, "viewer", snapshot=1).status, 403)
+        with self.relayed_parts(2, "viewer") as parts:
+            self.assertEqual({parts.next()[0]["content-type"] for _ in range(20)}, {"image/H264"})
+        for what, camera, account, status in [("not mapped", 77, "admin", 404), ("no session", 1, None, 401)]:
+            self.assertEqual(self.relay(camera, account).status, status, what)
+        for inner in ("/relay/1/127.0.0.1/80/1", f"/relay/1/127.0.0.1/{self.owner.tls_port}/1"):
+            connection, response = self.watcher.open("", "admin")
+            connection.close()
+            connection.request("GET", inner)
+            self.assertEqual(connection.getresponse().status, 404, "the inner address is not for browsers")
+            connection.close()
+
+    def test_the_owner_lets_in_only_who_proves_the_secret_now(self):
+        now = int(time.time())
+        wait_until(lambda: self.ask_owner(self.token(now), now) == 200, 15, "a peer is let in")
+        for what, cookie, timestamp in [
+            ("another secret", self.token(now, "ab" * 32), now),
+            ("stale", self.token(now - 400), now - 400),
+            ("from the future", self.token(now + 400), now + 400),
+            ("another time", self.token(now), now + 1),
+            ("no token", "", now),
+            ("the secret itself", self.secret, now),
+        ]:
+            self.assertEqual(self.ask_owner(cookie, timestamp), 401, what)
+        self.assertEqual(self.owner.request(play(1, snapshot=1, client="REC_SERVER")).status, 401)
+        self.assertEqual(self.ask_owner(self.token(now), now, privData='{"deniedCameras":[1]}'), 504)
+
+    def test_items_of_the_other_host_are_on_the_map(self):
+        self.watcher.cli("emap", "item", "add", "2", "camera", "1", "--server", "1", "--name", "Far")
+        for account, seen in [("admin", True), (None, False)]:
+            answer = self.watcher.request(play(2, itemType=1), account)
+            if not seen:
+                self.assertEqual(answer.status, 401)
+                continue
+            item = next(item for item in answer.json["data"]["items"] if item["hxId"] == "1")
+            self.assertEqual((item["ownerDevName"], item["hxIP"], item["hxPort"]), ("Owner", "localhost", str(self.owner.tls_port)))
+            timestamp, _, cookie = item["hxCookie"].partition("-")
+            self.assertEqual(cookie, self.token(timestamp))
+            self.assertNotIn(self.secret, answer.body.decode())
+        log = "".join(path.read_text() for home in (self.owner.home, self.watcher.home) for path in (home / "log").iterdir())
+        self.assertNotIn(self.secret, log)
+        self.assertNotIn("cookie=", log)
+
+    def test_a_server_that_is_gone_or_another_is_an_error(self):
+        impostor = self.enterContext(Installation())
+        line = self.owner.cli("server", "pair", "Again", "--address", "localhost", "--port", str(impostor.tls_port))
+        self.watcher.cli("server", "add", "Impostor", text=line)
+        query = call("VEXO.Relay", "Play", server=2, camera=1, snapshot=1)
+        answer = wait_until(lambda: (a := self.watcher.request(query, "admin")).status == 502 and a, 5, "another certificate")
+        self.assertIn("recording server", answer.json["error"]["message"])
+        impostor.stop()
+        self.assertEqual(self.watcher.request(query, "admin").status, 502)
+        self.watcher.cli("server", "remove", "2")
+        self.assertEqual(self.watcher.request(query, "admin").status, 404)
+
+
+if __name__ == "__main__":
+    unittest.main()
