@@ -13,7 +13,8 @@
 //           one recording (frame_stream reads its frames, frame_clock knows their times), a deck several cameras in step.
 //   ui/     what is on the screen: login; wall with grid and tiles, large_view, snapshot_dialog; events_screen with the
 //           stage of player_tiles and their transport, timeline (time_scale, timeline_drawing), calendar, event_filter and
-//           event_list. A picture is one camera's canvas with its messages. The address says what is open (route).
+//           event_list; maps_screen with a map_view of map_items, the map_card of the one that is pointed at, and the
+//           map_editor, which keeps its steps in edit_history. A picture is one camera's canvas with its messages. The address says what is open (route).
 //
 // ui knows live, playback and wire; playback knows wire and of live what waits and takes turns; live knows wire. Nothing here writes markup from text (see dom), and the page needs neither
 // inline styles nor scripts, so that a content security policy of 'self' holds.
@@ -25,9 +26,12 @@ import "./style/large.css";
 import "./style/snapshot.css";
 import "./style/events.css";
 import "./style/timeline.css";
+import "./style/map.css";
+import "./style/map_editor.css";
 import { element } from "./ui/dom";
 import { EventsScreen } from "./ui/events_screen";
 import { loginScreen } from "./ui/login";
+import { MapsScreen } from "./ui/maps_screen";
 import { hideNotice } from "./ui/notice";
 import { openScreen, type Screen } from "./ui/route";
 import { Wall } from "./ui/wall";
@@ -35,7 +39,7 @@ import { Server, ServerError, type Account } from "./wire/server";
 
 const app = document.querySelector<HTMLElement>("#app")!;
 /** What a logged-in user sees; null at the login. */
-let shown: { screen: Screen; view: Wall | EventsScreen } | null = null;
+let shown: { screen: Screen; view: { readonly root: HTMLElement; close(): void } } | null = null;
 let account: Account | null = null;
 
 const server = new Server(() => showLogin("Your session has ended. Please log in again."));
@@ -59,7 +63,7 @@ function followRoute(): void {
   const screen = openScreen();
   if (!account || shown?.screen === screen) return;
   shown?.view.close();
-  const Made = screen === "live" ? Wall : EventsScreen;
+  const Made = { live: Wall, events: EventsScreen, maps: MapsScreen }[screen];
   shown = { screen, view: new Made(server, account, () => showLogin("")) };
   app.replaceChildren(shown.view.root);
 }

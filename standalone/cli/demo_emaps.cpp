@@ -54,9 +54,9 @@ std::vector<EmapItem> GroundFloor(const Ids& ids, const std::map<std::string, in
     };
     return {item(EmapItemType::kCamera, cameras.at("Entrance"), "Entrance", 560, 620, 20),
             item(EmapItemType::kCamera, cameras.at("Parking"), "Parking", 980, 170, 200),
-            item(EmapItemType::kCamera, cameras.at("Entrance"), "Door contact", 470, 640, 0, 0),
-            item(EmapItemType::kDoor, ids.front_door, "Front door", 420, 690),
-            item(EmapItemType::kDoor, ids.back_door, "Loading door", 700, 240),
+            item(EmapItemType::kCamera, cameras.at("Entrance"), "Door contact", 460, 600, 0, 0),
+            item(EmapItemType::kDoor, ids.front_door, "Front door", 420, 700),
+            item(EmapItemType::kDoor, ids.back_door, "Loading door", 740, 160),
             item(EmapItemType::kIoModule, ids.io, "Smoke alarm", 190, 190, 0, 0),
             item(EmapItemType::kIoModule, ids.io, "Ventilation", 280, 190, 0, 1),
             item(EmapItemType::kPos, ids.till, "Till", 540, 430),

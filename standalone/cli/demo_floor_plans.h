@@ -16,11 +16,10 @@ constexpr char kGroundFloorPlan[] = R"(<?xml version="1.0" encoding="UTF-8"?>
     <path d="M120 620h200M120 636h200M120 652h200M120 668h200M120 684h200"/>
   </g>
   <g fill="none" stroke="#9fb4bf" stroke-width="8" stroke-linecap="square">
-    <path d="M380 700H100V100H640M740 200V700H460"/>
+    <path d="M380 700H100V100H740V120M740 200V700H460"/>
     <path d="M100 280H250M320 280H340V100"/>
     <path d="M100 460H240M310 460H340V700"/>
     <path d="M340 340H520"/>
-    <path d="M640 100h100v20"/>
   </g>
   <g fill="none" stroke="#62757f" stroke-width="2">
     <path d="M380 700a80 80 0 0 1 80 -80v80"/>

@@ -124,25 +124,39 @@ bool IsOnMap(const std::vector<store::EmapItem>& items, const store::Device& dev
     });
 }
 
+// A door, or a port, with its camera as far as the caller may watch it.
+void AppendState(Json::Value& list, const store::Device& device, int port, int camera,
+                 const std::vector<store::DeviceState>& states) {
+    const auto found = std::find_if(states.begin(), states.end(), [&](const store::DeviceState& state) {
+        return state.kind == device.kind && state.id == device.id && state.port == port;
+    });
+    Json::Value& json = list.append(Json::objectValue);
+    json["id"] = device.id_on_server;
+    json["hxId"] = device.server_id;
+    json["portIdx"] = port;
+    json["state"] = found == states.end() ? "" : found->state;
+    json["since"] = Json::Int64{found == states.end() ? 0 : found->since_s};
+    json["camera"] = camera != 0 && binding::MayUse(camera, store::CameraAccess::kLive) ? camera : 0;
+}
+
 std::string States(binding::RequestContext& context, const Parameters& parameters) {
-    const std::vector<store::EmapItem> items =
-        store::Emaps(context.Records()).Items(FindVisible(context, parameters).id);
+    const int emap = FindVisible(context, parameters).id;
+    const std::vector<store::EmapItem> items = store::Emaps(context.Records()).Items(emap);
     store::Devices devices(context.Records());
+    const std::vector<store::DeviceState> states = devices.States();
     Json::Value data;
     data["door"] = data["io"] = Json::arrayValue;
-    for (const store::DeviceState& state : devices.States()) {
-        const bool is_door = state.kind == EmapItemType::kDoor;
-        const auto device = devices.Find(state.kind, state.id);
-        if (!device || !IsOnMap(items, *device) ||
-            !binding::MaySee(is_door ? DeniableItem::kDoor : DeniableItem::kIoModule, state.id)) {
-            continue;
+    for (const store::Device& door : devices.List(EmapItemType::kDoor)) {
+        if (IsOnMap(items, door) && binding::MaySee(DeniableItem::kDoor, door.id)) {
+            AppendState(data["door"], door, -1, door.camera_id, states);
         }
-        Json::Value& json = data[is_door ? "door" : "io"].append(Json::objectValue);
-        json["id"] = device->id_on_server;
-        json["hxId"] = device->server_id;
-        json["portIdx"] = state.port;
-        json["state"] = state.state;
-        json["since"] = Json::Int64{state.since_s};
+    }
+    for (const store::Device& module : devices.List(EmapItemType::kIoModule)) {
+        if (IsOnMap(items, module) && binding::MaySee(DeniableItem::kIoModule, module.id)) {
+            for (const auto& [index, port] : module.ports) {
+                AppendState(data["io"], module, index, port.camera_id, states);
+            }
+        }
     }
     return SuccessAnswer(data);
 }

@@ -137,7 +137,7 @@ export class StreamSource implements LiveSource {
     };
     const video = new VideoPlayer(show, giveUp, this.#sound);
     try {
-      const answer = await this.#server.live(this.#camera.id, profile, deadline.signal);
+      const answer = await this.#server.live(this.#camera, profile, deadline.signal);
       const boundary = boundaryOf(answer.headers.get("Content-Type"));
       if (!answer.body || boundary === null) throw new ServerError(502, 0, "The server sent no pictures.");
       const parser = new MultipartParser(boundary, (part) => {

@@ -25,6 +25,7 @@ export interface LargeViewActions {
 export class LargeView {
   readonly root: HTMLElement;
   readonly camera: Camera;
+  readonly #actions: LargeViewActions;
   readonly #picture: Picture;
   readonly #source: StreamSource;
   readonly #sound = new Sound(() => this.#showSound());
@@ -43,6 +44,7 @@ export class LargeView {
   /** `still` is what the wall shows of this camera, as a first picture until the large one comes. */
   constructor(camera: Camera, server: Server, actions: LargeViewActions, still?: Picture) {
     this.camera = camera;
+    this.#actions = actions;
     this.#source = new StreamSource(
       server,
       camera,
@@ -97,6 +99,34 @@ export class LargeView {
     this.#picture.feed.stop();
     this.#sound.switchOff();
     this.root.remove();
+  }
+
+  /** Does what the key asks for; false for a key that means nothing here. */
+  key(event: KeyboardEvent): boolean {
+    switch (event.key.toLowerCase()) {
+      case "escape":
+        this.#actions.back();
+        return true;
+      case "arrowleft":
+      case "arrowup":
+        this.#actions.step(-1);
+        return true;
+      case "arrowright":
+      case "arrowdown":
+        this.#actions.step(1);
+        return true;
+      case "s":
+        this.#actions.snapshot();
+        return true;
+      case "f":
+        this.#actions.fullScreen();
+        return true;
+      case "m":
+        this.toggleSound();
+        return true;
+      default:
+        return false;
+    }
   }
 
   /** Call it while the user clicks or presses a key. */

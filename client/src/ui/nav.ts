@@ -9,6 +9,7 @@ import type { Screen } from "./route";
 const kScreens: [Screen, IconName, string, string][] = [
   ["live", "live", "Live", "#"],
   ["events", "events", "Events", "#events"],
+  ["maps", "map", "Maps", "#maps"],
 ];
 
 export function navigation(current: Screen): HTMLElement {

@@ -206,15 +206,10 @@ export class Wall {
 
   #key(event: KeyboardEvent): void {
     if (this.#dialog.isOpen || event.altKey || event.ctrlKey || event.metaKey || event.defaultPrevented) return;
-    const camera = this.#large?.camera ?? this.#grid.currentTile()?.camera;
-    const key = event.key.toLowerCase();
-    if (key === "s" && camera) this.#snapshot(camera);
-    else if (!this.#large) return;
-    else if (key === "escape") showWall();
-    else if (key === "arrowleft" || key === "arrowup") this.#step(-1);
-    else if (key === "arrowright" || key === "arrowdown") this.#step(1);
-    else if (key === "f") toggleFullScreen();
-    else if (key === "m") this.#large.toggleSound();
+    const camera = this.#grid.currentTile()?.camera;
+    if (this.#large) {
+      if (!this.#large.key(event)) return;
+    } else if (event.key.toLowerCase() === "s" && camera) this.#snapshot(camera);
     else return;
     event.preventDefault();
   }

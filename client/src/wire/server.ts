@@ -19,6 +19,8 @@ export interface Camera {
   liveview_port: number;
   cam_ptz: number;
   sound_support: number;
+  /** The recording server that owns it, where it has this id; absent or 0: this host's own. */
+  server?: number;
 }
 
 /** Answer of LoadCamera. */
@@ -127,13 +129,8 @@ export class Server {
   /** One picture in the camera's usual size. */
   async snapshot(camera: Camera, owner?: AbortSignal, limitMs = kAnswerLimitMs): Promise<Snapshot> {
     const deadline = new Deadline(limitMs, owner);
-    const parameters = { camera: String(camera.id) };
     try {
-      // What the camera sends is a picture already, or has to be made into one by the host.
-      const answer =
-        camera.video_type === kVideoTypeMjpeg
-          ? await this.media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", { ...parameters, snapshot: "1" }, deadline)
-          : await this.media("VEXO.Picture", "Get", parameters, deadline);
+      const answer = await this.#still(camera, deadline);
       const captured = Number(answer.headers.get("X-Capture-Time"));
       return { jpeg: await answer.blob(), takenMs: captured > 0 ? captured * 1000 : Date.now() };
     } catch (error) {
@@ -143,13 +140,19 @@ export class Server {
     }
   }
 
+  // What the camera sends is a picture already, or has to be made into one by the host.
+  #still(camera: Camera, deadline: Deadline): Promise<Response> {
+    const own = camera.video_type === kVideoTypeMjpeg || camera.server ? playOf(camera, { snapshot: "1" }) : null;
+    if (own) return this.media(...own, deadline);
+    return this.media("VEXO.Picture", "Get", { camera: String(camera.id) }, deadline);
+  }
+
   /**
    * Opens a live stream; the caller reads its body and ends it with `signal`. `profile` null means the camera's own choice.
    */
-  async live(cameraId: number, profile: number | null, signal: AbortSignal): Promise<Response> {
-    const parameters: Record<string, string> = { camera: String(cameraId) };
-    if (profile !== null) parameters["profileType"] = String(profile);
-    return this.media("VEXO.Lookhaven.Player.LiveviewSrc", "Play", parameters, { signal }).catch((error: unknown) => {
+  async live(camera: Camera, profile: number | null, signal: AbortSignal): Promise<Response> {
+    const more: Record<string, string> = profile === null ? {} : { profileType: String(profile) };
+    return this.media(...playOf(camera, more), { signal }).catch((error: unknown) => {
       throw asServerError(error);
     });
   }
@@ -169,18 +172,21 @@ export class Server {
     throw failure.status === 502 ? new ServerError(502, failure.code, "No picture came.") : failure;
   }
 
-  /** The data of an answer. With `form` the request is a POST. A session that has ended is told unless `quiet`. */
+  /** The data of an answer. With `form` or `json` the request is a POST. A session that has ended is told unless `quiet`. */
   async call<Data>(
     api: string,
     method: string,
     parameters: Record<string, string>,
-    how: { form?: Record<string, string>; quiet?: boolean } = {},
+    how: { form?: Record<string, string>; json?: unknown; quiet?: boolean } = {},
   ): Promise<Data> {
     const deadline = new Deadline(kAnswerLimitMs);
     try {
       const answer = await fetch(address(api, method, parameters), {
         signal: deadline.signal,
         ...(how.form ? { method: "POST", body: new URLSearchParams(how.form) } : {}),
+        ...(how.json
+          ? { method: "POST", body: JSON.stringify(how.json), headers: { "Content-Type": "application/json" } }
+          : {}),
       });
       if (answer.status === 401 && !how.quiet) this.#onSessionEnd();
       if (!answer.ok) throw await failureOf(answer);
@@ -193,6 +199,13 @@ export class Server {
       deadline.release();
     }
   }
+}
+
+/** How a camera's live view is asked for: the host fetches another server's cameras for us. */
+function playOf({ id, server }: Camera, more: Record<string, string>): [string, string, Record<string, string>] {
+  const camera = String(id);
+  if (server) return ["VEXO.Relay", "Play", { server: String(server), camera, ...more }];
+  return ["VEXO.Lookhaven.Player.LiveviewSrc", "Play", { camera, ...more }];
 }
 
 /** Relative, so that the client works below any path. */
