@@ -16,7 +16,7 @@ const kMjpeg = { id: 1, video_type: 1 } as Camera;
 const cameras = (server: Server) => server.cameras();
 const login = (server: Server) => server.login("admin", "secret");
 const snapshot = (server: Server) => server.snapshot(kMjpeg);
-const live = (server: Server) => server.live(1, 1, new AbortController().signal);
+const live = (server: Server) => server.live(kMjpeg, 1, new AbortController().signal);
 
 test.each([
   ["a handler's error with HTTP 200", cameras, () => json(200, failure(400)), "The server refused.", false],

@@ -3,11 +3,14 @@
 # E-maps through the web server: who sees what of them, how they are changed, and pictures that mean harm.
 import json
 import os
+import shutil
+import tempfile
 import unittest
 import urllib.request
 
 from api_test import call, play
 from installation import Installation
+from visit import Visit
 
 JSON = {"Content-Type": "application/json"}
 
@@ -101,6 +104,44 @@ class EmapTest(unittest.TestCase):
         os.mkfifo(picture)  # would hang whoever opens it to read
         data = self.shown(made["id"])
         self.assertEqual((data["emap"], data["emapLength"], data["itemNum"]), ("", "0", 1))
+
+    def test_a_visit(self):
+        harm = self.server.home / "harm.svg"
+        script = "<script>top.document.title = 'harmed'</script><rect width='9' height='9' onload='top.document.title=1'/>"
+        harm.write_text(f"<svg xmlns='http://www.w3.org/2000/svg' width='40' height='30'>{script}</svg>")
+        self.command("emap", "add", "Harmful", str(harm))
+        with tempfile.TemporaryDirectory() as folder, Visit("maps.mjs", f"http://127.0.0.1:{self.server.port}/", folder) as visit:
+            seen = visit.next()
+            self.assertEqual((seen["step"], seen["items"], seen["picture"]), ("shown", 9, [1200, 800]))
+            visit.go_on()
+            self.assertEqual(visit.next(), {"step": "camera", "hash": "#map=1&camera=1"})
+            visit.go_on()
+            self.assertEqual(visit.next(), {"step": "link", "hash": "#map=2"})
+            visit.go_on()
+
+            seen = visit.next()
+            self.assertEqual(seen["step"], "moved")
+            self.assertEqual(seen["undone"], seen["before"])
+            self.assertEqual(seen["saved"], seen["dragged"])
+            self.assertTrue(seen["dragged"][0] > seen["before"][0] and seen["dragged"][1] < seen["before"][1], seen)
+            items = self.ask("Items", emap=1).json["data"]
+            till = next(item for item in items["items"] if item["name"] == "Till")
+            self.assertEqual([till["x"], till["y"]], seen["saved"])
+            self.assertEqual(self.save(emap=1, revision=items["revision"], items=[till]).status, 200)
+            visit.go_on()
+
+            seen = visit.next()
+            self.assertEqual(seen["step"], "saved over")
+            items = self.ask("Items", emap=1).json["data"]["items"]
+            self.assertEqual(len(items), 9, "the visitor's items are on top of the others'")
+            self.assertEqual([till["x"] + 1, till["y"]], seen["saved"])
+            visit.go_on()
+
+            seen = visit.next()
+            self.assertEqual((seen["step"], seen["title"], seen["complaints"]), ("harmless", "Lookhaven", []))
+            visit.go_on()
+            if keep := os.environ.get("LOOKHAVEN_KEEP_SCREENSHOTS"):
+                shutil.copytree(folder, f"{keep}/maps", dirs_exist_ok=True)
 
     def test_the_page_may_run_no_script_of_a_picture(self):
         with urllib.request.urlopen(f"http://127.0.0.1:{self.server.port}/") as page:
