@@ -10,7 +10,6 @@
 #include <cstdint>
 #include <string>
 
-
 #include "platform/output/multipartresponse.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"

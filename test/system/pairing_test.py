@@ -78,6 +78,16 @@ class PairingTest(unittest.TestCase):
         ]:
             self.assertEqual(self.ask_owner(cookie, timestamp), 401, what)
         self.assertEqual(self.owner.request(play(1, snapshot=1, client="REC_SERVER")).status, 401)
+        kinds = {}
+        for who, query, account in [
+            ("peer", play(1, itemType=1, client="REC_SERVER", cookie=self.token(now)), None),
+            ("admin", play(1, itemType=1), "admin"),
+            ("viewer", play(1, itemType=1), "viewer"),
+        ]:
+            headers = {"Cookie": f"timestamp={now}"} if who == "peer" else {}
+            kinds[who] = [item["type"] for item in self.owner.request(query, account, headers=headers).json["data"]["items"]]
+        self.assertEqual(kinds["peer"], kinds["admin"], "a peer sees all")
+        self.assertLess(len(kinds["viewer"]), len(kinds["admin"]))
         self.assertEqual(self.ask_owner(self.token(now), now, privData='{"deniedCameras":[1]}'), 504)
 
     def test_items_of_the_other_host_are_on_the_map(self):
