@@ -14,7 +14,6 @@ namespace lookhaven::cli {
 
 namespace {
 
-using store::Device;
 using store::Devices;
 using store::EmapItem;
 using store::EmapItemType;

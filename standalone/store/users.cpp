@@ -199,13 +199,15 @@ void Users::AllowGroup(int id, int group_id, std::initializer_list<CameraAccess>
 }
 
 void Users::DenyItem(int id, DeniableItem kind, int item_id) {
-    connection_.Write(
-        [&](soci::session& sql) { DenyRows(sql, kDeniedItems, id, item_id, std::initializer_list{kind}); });
+    connection_.Write([&](soci::session& sql) {
+        DenyRows(sql, kDeniedItems, id, item_id, std::initializer_list<DeniableItem>{kind});
+    });
 }
 
 void Users::AllowItem(int id, DeniableItem kind, int item_id) {
-    connection_.Write(
-        [&](soci::session& sql) { AllowRows(sql, kDeniedItems, id, item_id, std::initializer_list{kind}); });
+    connection_.Write([&](soci::session& sql) {
+        AllowRows(sql, kDeniedItems, id, item_id, std::initializer_list<DeniableItem>{kind});
+    });
 }
 
 void Users::Remove(int id) {
