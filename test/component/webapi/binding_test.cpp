@@ -27,7 +27,7 @@
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/users.h"
-#include "test/component/webapi/recording_fixture.h"
+#include "test/support/footage/footage.h"
 
 namespace lookhaven::binding {
 namespace {

@@ -12,7 +12,7 @@
 #include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
 #include "test/component/webapi/host_under_test.h"
-#include "test/component/webapi/recording_fixture.h"
+#include "test/support/footage/footage.h"
 
 namespace lookhaven::webapi {
 namespace {

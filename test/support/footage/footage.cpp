@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "test/component/webapi/recording_fixture.h"
+#include "test/support/footage/footage.h"
 
 #include <array>
 #include <fstream>
