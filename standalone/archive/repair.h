@@ -20,8 +20,8 @@ struct Contents {
 
 // Cuts the recording behind its last whole cluster and makes its index say exactly what is there; an absent or damaged
 // index is made anew. Does nothing to a recording that is whole. frame_count is 0 when nothing can be saved; then the
-// files are unchanged, and the caller may remove them. Throws ArchiveError when the recording is still being written,
-// std::system_error.
+// files are unchanged, and the caller may remove them. Throws std::system_error,
+// EBUSY while the recording is still being written.
 Contents CloseCrashed(const std::filesystem::path& recording);
 
 }  // namespace lookhaven::archive
