@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
+#include "standalone/store/event_row.h"
 #include "standalone/store/events.h"
 
 namespace lookhaven::store {
@@ -13,60 +14,9 @@ namespace {
 
 constexpr int kRowsAtOnce = 10'000;
 
-// SOCI binds long long, whatever std::int64_t is.
-using Number = long long;
-
-constexpr const char* kColumns =
-    "select id, camera_id, mount_id, start_s, end_s, recording, reason, frame_count,"
-    " size_bytes, video_type, audio_codec, width, height, path, archived, demo from events";
-
-// A row as it is read: an Event, with what SOCI takes in other types.
-struct Row {
-    Event event;
-    Number start = 0;
-    Number end = 0;
-    Number size = 0;
-    int recording = 0;
-    int video_type = 0;
-    int archived = 0;
-    int demo = 0;
-
-    // The row as an event; borrowed until the next one is fetched.
-    const Event& Read() {
-        event.start_s = start;
-        event.end_s = end;
-        event.size_bytes = size;
-        event.recording = recording != 0;
-        event.video_type = static_cast<VideoType>(video_type);
-        event.archived = archived != 0;
-        event.demo = demo != 0;
-        return event;
-    }
-
-    // Binds all columns in the order of kColumns to what the query gives.
-    void BindTo(soci::statement& statement) {
-        statement.exchange(soci::into(event.id));
-        statement.exchange(soci::into(event.camera_id));
-        statement.exchange(soci::into(event.mount_id));
-        statement.exchange(soci::into(start));
-        statement.exchange(soci::into(end));
-        statement.exchange(soci::into(recording));
-        statement.exchange(soci::into(event.reason));
-        statement.exchange(soci::into(event.frame_count));
-        statement.exchange(soci::into(size));
-        statement.exchange(soci::into(video_type));
-        statement.exchange(soci::into(event.audio_codec));
-        statement.exchange(soci::into(event.width));
-        statement.exchange(soci::into(event.height));
-        statement.exchange(soci::into(event.path));
-        statement.exchange(soci::into(archived));
-        statement.exchange(soci::into(demo));
-    }
-};
-
 template <typename Visitor, typename... Use>
 void ForEach(soci::session& sql, const std::string& query, Visitor&& visit, const Use&... use) {
-    Row row;
+    EventRow row;
     soci::statement rows(sql);
     row.BindTo(rows);
     (rows.exchange(use), ...);
@@ -96,7 +46,7 @@ void Search(soci::session& sql, const EventFilter& filter, Number limit, const E
     const Number earliest = std::max<Number>(begin, kMaxEventSeconds) - kMaxEventSeconds;
     const int finished_only = filter.finished_only;
     int camera = 0;
-    Row row;
+    EventRow row;
     soci::statement rows(sql);
     row.BindTo(rows);
     rows.exchange(soci::use(camera, "camera"));
@@ -108,7 +58,7 @@ void Search(soci::session& sql, const EventFilter& filter, Number limit, const E
     rows.exchange(soci::use(finished_only, "finished"));
     rows.exchange(soci::use(limit, "limit"));
     rows.alloc();
-    rows.prepare(std::string(kColumns) +
+    rows.prepare(std::string(EventRow::kSelect) +
                  " where camera_id = :camera and start_s >= :earliest and start_s < :end and end_s > :begin"
                  " and (:mount = 0 or mount_id = :mount) and (:reason = 0 or reason = :reason)"
                  " and (:finished = 0 or recording = 0) order by " +
@@ -127,7 +77,7 @@ void Search(soci::session& sql, const EventFilter& filter, Number limit, const E
 
 std::optional<Event> Events::Find(int id) {
     std::vector<Event> found = connection_.Read([&](soci::session& sql) {
-        return Collect(sql, std::string(kColumns) + " where id = :id", soci::use(id, "id"));
+        return Collect(sql, std::string(EventRow::kSelect) + " where id = :id", soci::use(id, "id"));
     });
     return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
 }
@@ -153,15 +103,16 @@ void Events::Visit(const EventFilter& filter, const Visitor& visitor) {
 }
 
 std::vector<Event> Events::Open() {
-    return connection_.Read(
-        [](soci::session& sql) { return Collect(sql, std::string(kColumns) + " where recording = 1 order by id"); });
+    return connection_.Read([](soci::session& sql) {
+        return Collect(sql, std::string(EventRow::kSelect) + " where recording = 1 order by id");
+    });
 }
 
 std::vector<Event> Events::Oldest(int mount_id, int limit) {
     return connection_.Read([&](soci::session& sql) {
         return Collect(sql,
-                       std::string(kColumns) + " where mount_id = :mount and recording = 0 and archived = 0"
-                                               " and demo = 0 order by start_s limit :limit",
+                       std::string(EventRow::kSelect) + " where mount_id = :mount and recording = 0 and archived = 0"
+                                                        " and demo = 0 order by start_s limit :limit",
                        soci::use(mount_id, "mount"), soci::use(limit, "limit"));
     });
 }
@@ -173,8 +124,8 @@ void Events::VisitMount(int mount_id, const Visitor& visitor) {
         do {
             page = connection_.Read([&](soci::session& sql) {
                 return Collect(sql,
-                               std::string(kColumns) + " where mount_id = :mount and camera_id = :camera"
-                                                       " and id > :after order by id limit :limit",
+                               std::string(EventRow::kSelect) + " where mount_id = :mount and camera_id = :camera"
+                                                                " and id > :after order by id limit :limit",
                                soci::use(mount_id, "mount"), soci::use(camera, "camera"), soci::use(after, "after"),
                                soci::use(kRowsAtOnce, "limit"));
             });

@@ -6,6 +6,7 @@
 #include <algorithm>
 
 #include "standalone/store/connection.h"
+#include "standalone/store/event_row.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
@@ -15,9 +16,6 @@ namespace {
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::size_t kMaxCodecBytes = 32;
 constexpr int kRowsAtOnce = 10'000;
-
-// SOCI binds long long, whatever std::int64_t is.
-using Number = long long;
 
 void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
     if (start_s < 0 || end_s < start_s || end_s - start_s > kMaxEventSeconds) {
@@ -35,34 +33,8 @@ void RequireEvent(const Event& event) {
     }
 }
 
-// A row as it is bound: what an Event holds, in the types that SOCI takes.
-struct Row {
-    Event event;
-    Number start = 0;
-    Number end = 0;
-    Number size = 0;
-    int recording = 0;
-    int video_type = 0;
-    int archived = 0;
-    int demo = 0;
-
-    Row() = default;
-    explicit Row(const Event& from) { Assign(from); }
-
-    void Assign(const Event& from) {
-        event = from;
-        start = from.start_s;
-        end = from.end_s;
-        size = from.size_bytes;
-        recording = from.recording;
-        video_type = static_cast<int>(from.video_type);
-        archived = from.archived;
-        demo = from.demo;
-    }
-};
-
 // The one statement that makes rows; the row outlives it.
-soci::statement PrepareInsert(soci::session& sql, const Row& row) {
+soci::statement PrepareInsert(soci::session& sql, const EventRow& row) {
     const Event& event = row.event;
     return (
         sql.prepare << "insert into events (id, camera_id, mount_id, start_s, end_s, recording, reason, frame_count,"
@@ -123,7 +95,7 @@ void Events::Begin(const Event& event) {
         if (sql.got_data()) {
             throw AlreadyExists("there is already an event " + std::to_string(event.id));
         }
-        const Row row(event);
+        const EventRow row(event);
         PrepareInsert(sql, row).execute(true);
     });
 }
@@ -132,7 +104,7 @@ void Events::AddAll(std::span<const Event> events) {
     std::ranges::for_each(events, RequireEvent);
     connection_.Write([&](soci::session& sql) {
         int id = lookhaven::store::NextIds(sql, "event", static_cast<int>(events.size()));
-        Row row;
+        EventRow row;
         soci::statement insert = PrepareInsert(sql, row);
         for (const Event& event : events) {
             row.Assign(event);
