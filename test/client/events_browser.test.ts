@@ -141,6 +141,32 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await vi.waitFor(() => expect(archive.streams).toEqual([]));
   }, 40_000);
 
+  test("ten thousand events of a day are listed and drawn, and cost the page no more elements than ten", async () => {
+    const busy = noon - 2 * 86_400;
+    for (let at = 0; at < 10_000; at += 1) {
+      const start = busy - 40_000 + at * 8;
+      archive.recorded.push({ id: 1_000 + at, camera: 1 + (at % 2), start, stop: start + 8, frames: 80, reason: at % 5 ? 1 : 3 });
+    }
+    const page = await opened("#events", 1440, 900);
+    const elements = () => document.querySelectorAll("*").length;
+    await page.until(() => document.querySelector(".day.has") !== null);
+    const quiet = await page.run(elements);
+    await page.click(`.day[data-day="${new Date(busy * 1000).setHours(0, 0, 0, 0)}"]`);
+    await page.until(() => document.querySelector(".list-head")!.textContent!.startsWith("10000 events"));
+    expect(await page.run(elements)).toBeLessThan(quiet + 500);
+    const box = await page.run(() => {
+      const { x, y, width, height } = document.querySelector(".timeline-lanes")!.getBoundingClientRect();
+      return { x: x + width / 2, y: y + height / 2 };
+    });
+    for (let step = 0; step < 20; step += 1) {
+      await page.send("Input.dispatchMouseEvent", { type: "mouseWheel", ...box, deltaX: 0, deltaY: step < 10 ? -120 : 120 });
+    }
+    await page.until(() => document.querySelector(".list-head")!.textContent!.startsWith("10000 events"));
+    expect(await page.run(elements)).toBeLessThan(quiet + 500);
+    await page.send("Page.close", {});
+    archive.recorded.splice(archive.recorded.findIndex(({ id }) => id === 1_000), 10_000);
+  }, 40_000);
+
   test("a phone has all of it, nothing too small for a finger, and no sideways scrolling", async () => {
     const page = await opened("#event=14", 390, 844);
     await state(page, "playing");
