@@ -25,11 +25,11 @@ std::string Location(const store::RecordingServer& server, const fs::path& certi
            ";\n    error_page 401 403 500 502 504 =502 /error/no-server;\n}\n";
 }
 
-// A web server that does not run takes the files when it starts.
+// One that does not run takes the files when it starts. What it left of its number may be another program's by now.
 void TellWebServer(const fs::path& pid_file) {
     try {
         const int pid = std::stoi(base::ReadFile(pid_file));
-        if (pid > 1) {
+        if (pid > 1 && base::ReadFile("/proc/" + std::to_string(pid) + "/comm") == "nginx\n") {
             ::kill(pid, SIGHUP);
         }
     } catch (const std::system_error&) {
