@@ -2,15 +2,19 @@
 #
 # What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
 # through the web server, also while it is still being recorded; and a session's players give way to each other.
+import base64
 import contextlib
 import os
 import pathlib
+import shutil
 import subprocess
+import tempfile
 import time
 import unittest
 
 from installation import Installation, Parts, recorded_events, wait_until
 from painted import NumberReader
+from visit import Visit
 
 PLAYER = {"api": "VEXO.Lookhaven.Player", "version": 1}
 FAR = 10**6
@@ -39,6 +43,11 @@ def numbered(parts, count):
         assert picture_head["content-type"] == "image/jpeg", picture_head
         pairs.append((int(body), picture))
     return pairs
+
+
+def seconds_of(clock):
+    hours, minutes, seconds = map(int, clock.split(":"))
+    return hours * 3600 + minutes * 60 + seconds
 
 
 def pictures(parts, count):
@@ -146,6 +155,35 @@ class PlaybackTest(unittest.TestCase):
         except EOFError:
             return True
         return False
+
+    def test_a_visit_finds_the_picture_of_a_time(self):
+        middle = self.event["start"] + 8
+        with tempfile.TemporaryDirectory() as folder, Visit(
+            "events.mjs", f"http://127.0.0.1:{self.server.port}/", folder,
+            EVENT_START=str(self.event["start"]), EVENT_MIDDLE=str(middle), TZ="UTC",
+        ) as visit:
+            def see(step):
+                seen = visit.next()
+                self.assertEqual(seen["step"], step)
+                if "picture" in seen:
+                    painted = self.reader.read([base64.b64decode(seen["picture"])])[0]
+                    self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
+                    clock = time.strftime("%H:%M:%S", time.gmtime(self.event["start"] + painted / 25))
+                    off = abs(seconds_of(clock) - seconds_of(seen["time"][-8:]))
+                    self.assertLessEqual(off, 1, f"{clock} at {seen['time']}")
+                visit.go_on()
+                return seen
+
+            found = see("found")
+            self.assertLess(abs(found["told"] - 8 * 25), 75, "about the time that was clicked")
+            self.assertTrue(see("stands still")["same"])
+            self.assertEqual(see("one on")["told"], found["told"] + 1)
+            self.assertEqual(see("two back")["told"], found["told"] - 1)
+            jumped = see("jumped")
+            self.assertGreater(jumped["told"], found["told"])
+            self.assertEqual(jumped["complaints"], [])
+            if keep := os.environ.get("LOOKHAVEN_KEEP_SCREENSHOTS"):
+                shutil.copytree(folder, f"{keep}/events", dirs_exist_ok=True)
 
     def test_an_older_player_gives_way(self):
         cookie, other_cookie = self.server.login("admin"), self.server.login("admin")

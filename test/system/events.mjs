@@ -1,0 +1,72 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a jump.
+// EVENT_START and EVENT_MIDDLE are Unix seconds of a recording of camera 1.
+import { address, folder, logIn, report, visit } from "./chromium.mjs";
+
+const start = Number(process.env.EVENT_START);
+const middle = Number(process.env.EVENT_MIDDLE);
+
+await visit(async (page, complaints) => {
+  const settled = (state) => page.locator(`.stage-picture[data-state="${state}"]`).first().waitFor({ timeout: 15_000 });
+  const text = (selector) => page.locator(selector).first().textContent();
+  /** What the canvas shows, the frame that is told, and the second of the playhead. */
+  const shown = async () => ({
+    picture: await page.evaluate(() => document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1]),
+    told: Number(/^frame (\d+)/.exec(await text(".transport-frame"))[1]) - 1,
+    time: await text(".transport-time"),
+  });
+
+  await page.goto(`${address}#events`);
+  await logIn(page);
+  const day = new Date(start * 1000).setHours(0, 0, 0, 0) / 1000;
+  await page.locator(`.day.has[data-day="${day * 1000}"]`).click();
+  const box = await page.locator(".timeline-lanes").boundingBox();
+  const y = box.y + 16;
+  /** The time under a point of the timeline, by a click on it. */
+  const timeAt = async (x) => {
+    await page.mouse.click(box.x + x, y);
+    await page.waitForTimeout(400);
+    const words = (await text(".transport-time")) || (await text(".message-sentence"));
+    const [, hours, minutes, seconds] = /(\d\d):(\d\d):(\d\d)/.exec(words);
+    return day + hours * 3600 + minutes * 60 + Number(seconds);
+  };
+  // The day fills the width; from there the wheel goes to the seconds, and each look corrects the last.
+  let x = (box.width * (middle - day)) / 86_400;
+  let scale = Infinity;
+  while (scale > 0.2) {
+    await page.mouse.move(box.x + x, y);
+    for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
+    const [here, right] = [await timeAt(x), await timeAt(x + 100)];
+    scale = (right - here) / 100;
+    x += (middle - here) / scale;
+  }
+  await timeAt(x);
+  await settled("playing");
+  await page.keyboard.press(" ");
+  await settled("paused");
+  await page.screenshot({ path: `${folder}/events.png` });
+  await report("found", await shown());
+
+  const before = await shown();
+  await page.waitForTimeout(700);
+  await report("stands still", { same: before.picture === (await shown()).picture });
+
+  const next = async (key, frame) => {
+    await page.keyboard.press(key);
+    await page.waitForFunction((wanted) => document.querySelector(".transport-frame").textContent.startsWith(`frame ${wanted} `), frame + 1);
+    await settled("paused");
+    await page.waitForTimeout(200);
+  };
+  await next("ArrowRight", before.told + 1);
+  await report("one on", await shown());
+  await next("ArrowLeft", before.told);
+  await next("ArrowLeft", before.told - 1);
+  await report("two back", await shown());
+
+  await timeAt(x + 3 / scale);
+  await settled("playing");
+  await page.keyboard.press(" ");
+  await settled("paused");
+  await report("jumped", { ...(await shown()), complaints });
+});
