@@ -82,6 +82,7 @@ class Stand:
         self.http_port = free_port()
         self.socket = str(self._home / "run" / "webapi.sock")
         self.database = self._home / "lookhaven.db"
+        self.mount = self._home / "recordings"
         try:
             if store is not None:
                 (self._home / "store").write_text(store + "\n")
@@ -113,6 +114,14 @@ class Stand:
     def add_camera(self, name, source, video_type="mjpeg"):
         self._run("camera", "add", "--name", name, "--type", video_type, "--source", source)
 
+    def take_in_recordings(self):
+        """Gives the recordings that lie on the mount rows and indexes; the event of each camera."""
+        self._run("verify", "--repair")
+        listed = subprocess.run(
+            [self._bin / "lookhaven", "event", "list", "--json"], check=True, capture_output=True, env=self._environment
+        ).stdout
+        return {event["camera_id"]: event["id"] for event in json.loads(listed)}
+
     def add_events(self, count, days):
         self._run("demo", "events", "--count", str(count), "--days", str(days))
 
@@ -135,6 +144,7 @@ class Stand:
              "-subj", "/CN=bench", "-keyout", self._home / "tls/key.pem", "-out", self._home / "tls/certificate.pem"],
             check=True, capture_output=True,
         )
+        self._run("server", "configure")
         configuration = (ROOT / "packaging/nginx/lookhaven.conf.in").read_text()
         for word, value in {
             "user": "user root root;" if os.geteuid() == 0 else "",
