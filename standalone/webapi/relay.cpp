@@ -7,6 +7,7 @@
 #include <sys/socket.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/file_descriptor.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
@@ -16,20 +17,28 @@ namespace lookhaven::webapi {
 
 namespace {
 
+// Without sending anything: an address of a family that this machine does not speak has no route.
+bool HasRoute(const addrinfo& address) {
+    const base::FileDescriptor probe(::socket(address.ai_family, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+    return probe && ::connect(probe.Get(), address.ai_addr, address.ai_addrlen) == 0;
+}
+
 // The web server knows no names, and one that is gone must not keep it from starting: so this process looks them up.
-std::string NumericAddress(const std::string& name) {
+std::string NumericAddress(const std::string& name, int port) {
     addrinfo hints{};
     hints.ai_socktype = SOCK_STREAM;
     addrinfo* found = nullptr;
-    if (::getaddrinfo(name.c_str(), nullptr, &hints, &found) != 0) {
-        throw Failure(502, "the recording server's name has no address");
+    if (::getaddrinfo(name.c_str(), std::to_string(port).c_str(), &hints, &found) == 0) {
+        const std::unique_ptr<addrinfo, decltype(&::freeaddrinfo)> owned(found, ::freeaddrinfo);
+        for (const addrinfo* each = found; each != nullptr; each = each->ai_next) {
+            char text[NI_MAXHOST];
+            if (HasRoute(*each) &&
+                ::getnameinfo(each->ai_addr, each->ai_addrlen, text, sizeof text, nullptr, 0, NI_NUMERICHOST) == 0) {
+                return each->ai_family == AF_INET6 ? "[" + std::string(text) + "]" : text;
+            }
+        }
     }
-    const std::unique_ptr<addrinfo, decltype(&::freeaddrinfo)> owned(found, ::freeaddrinfo);
-    char text[NI_MAXHOST];
-    if (::getnameinfo(found->ai_addr, found->ai_addrlen, text, sizeof text, nullptr, 0, NI_NUMERICHOST) != 0) {
-        throw Failure(502, "the recording server's name has no address");
-    }
-    return found->ai_family == AF_INET6 ? "[" + std::string(text) + "]" : text;
+    throw Failure(502, "the recording server's name leads nowhere");
 }
 
 // "&name=number" when it was given.
@@ -59,8 +68,8 @@ std::string Play(binding::RequestContext& context, const Parameters& parameters)
         query += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
     }
     return "Status: 200 OK\r\nX-Accel-Redirect: /relay/" + std::to_string(server_id) + "/" +
-           NumericAddress(server->address) + "/" + std::to_string(server->port) + "/" + timestamp + "?" + query +
-           "\r\nContent-Length: 0\r\n\r\n";
+           NumericAddress(server->address, server->port) + "/" + std::to_string(server->port) + "/" + timestamp + "?" +
+           query + "\r\nContent-Length: 0\r\n\r\n";
 }
 
 }  // namespace
