@@ -3,9 +3,12 @@
 
 #include <algorithm>
 #include <charconv>
+#include <filesystem>
 #include <limits>
 #include <map>
+#include <span>
 #include <string_view>
+#include <vector>
 
 #include "standalone/archive/recording_log.h"
 #include "standalone/binding/event_record.h"
@@ -14,6 +17,7 @@
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 
+namespace archive = lookhaven::archive;
 namespace store = lookhaven::store;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
@@ -76,11 +80,26 @@ int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
     });
 }
 
+// The camera may have recorded to other mounts before: what its folders there tell counts too.
 int ReadRecLog(const std::string& storagePath, long from, int duration, unsigned char* buffer) {
     return OrFailure("ReadRecLog", -1, [&] {
-        const bool read =
-            !storagePath.empty() && duration > 0 &&
-            lookhaven::archive::ReadRecordingLog(storagePath, from, {buffer, static_cast<std::size_t>(duration)});
+        const std::filesystem::path asked(storagePath);
+        const std::vector<store::Mount> mounts = store::Mounts(RequestContext::Current().Records()).List();
+        if (duration <= 0 || std::ranges::none_of(mounts, [&](const store::Mount& mount) {
+                return asked.parent_path() == mount.path;
+            })) {
+            return -1;
+        }
+        const std::span<std::uint8_t> seconds(buffer, static_cast<std::size_t>(duration));
+        std::ranges::fill(seconds, std::uint8_t{0});
+        std::vector<std::uint8_t> found(seconds.size());
+        bool read = false;
+        for (const store::Mount& mount : mounts) {
+            if (archive::ReadRecordingLog(std::filesystem::path(mount.path) / asked.filename(), from, found)) {
+                read = true;
+                std::ranges::transform(seconds, found, seconds.begin(), std::ranges::max);
+            }
+        }
         return read ? 0 : -1;
     });
 }

@@ -18,6 +18,7 @@
 #include "platform/recording/jpegextractor.h"
 #include "platform/recording/pacing.h"
 #include "standalone/archive/layout.h"
+#include "standalone/archive/recording_log.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/binding/request_context.h"
@@ -395,6 +396,14 @@ TEST_F(Binding, FindsEventsAndTheirSeconds) {
     auto* bytes = reinterpret_cast<unsigned char*>(seconds.data());
     ASSERT_EQ(ReadRecLog(camera.GetStoragePath(), kNoon - 3, 12, bytes), 0);
     EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\1\0\0\0\0", 12));
+    store::Mount former;
+    former.name = "Former";
+    former.path = (folder_ / "former").string();
+    std::filesystem::create_directories(folder_ / "former" / "1");
+    store::Mounts(footage_->Records()).Add(former);
+    archive::WriteRecordingLog(folder_ / "former" / "1", kNoon + 4, kNoon + 7, 3);
+    ASSERT_EQ(ReadRecLog(camera.GetStoragePath(), kNoon - 3, 12, bytes), 0);
+    EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\3\3\3\0\0", 12)) << "what it recorded elsewhere before";
     for (const auto& [path, duration] : {std::pair{std::string(), 12},
                                          {std::string("/nowhere/1"), 12},
                                          {camera.GetStoragePath(), 0},
