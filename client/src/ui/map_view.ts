@@ -93,7 +93,10 @@ export class MapView<Item extends MapItem> {
     this.root.classList.toggle("has-small-items", flags.smallItems);
     this.#views = items.map((item) => {
       const view = new MapItemView(item);
-      view.root.addEventListener("click", () => this.#moved || this.#actions.choose(view, view.item as Item));
+      // What ends a drag is no click; a key (detail 0) always is one.
+      view.root.addEventListener("click", ({ detail }) => {
+        if (!this.#moved || detail === 0) this.#actions.choose(view, view.item as Item);
+      });
       view.root.addEventListener("pointerenter", (event) => event.pointerType === "mouse" && this.#actions.point(view));
       view.root.addEventListener("pointerleave", () => this.#actions.point(null));
       view.root.addEventListener("focus", () => {
@@ -187,6 +190,8 @@ export class MapView<Item extends MapItem> {
 
   #down(event: PointerEvent): void {
     if (event.button !== 0) return;
+    // One that was let go outside of the window was never seen to end.
+    if (event.isPrimary) this.#fingers.clear();
     this.#moved = this.#fingers.size > 0;
     this.#fingers.set(event.pointerId, { x: event.clientX, y: event.clientY });
   }
