@@ -6,7 +6,7 @@
 
 #include "standalone/archive/recording_log.h"
 #include "standalone/archive/span_file.h"
-#include "test/component/archive/archive_folder.h"
+#include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
 

@@ -4,7 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "test/component/archive/archive_folder.h"
+#include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
 

@@ -9,7 +9,7 @@
 #include "standalone/archive/recording.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
-#include "test/component/archive/archive_folder.h"
+#include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
 

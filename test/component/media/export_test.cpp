@@ -12,8 +12,8 @@
 #include "standalone/base/file.h"
 #include "standalone/media/libav_library.h"
 #include "standalone/media/source.h"
-#include "test/component/archive/archive_folder.h"
-#include "test/component/media/clips.h"
+#include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
 

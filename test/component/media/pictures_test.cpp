@@ -11,8 +11,8 @@
 
 #include "standalone/media/picture_reader.h"
 #include "standalone/media/source.h"
-#include "test/component/archive/archive_folder.h"
-#include "test/component/media/clips.h"
+#include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
 

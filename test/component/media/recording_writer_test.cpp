@@ -14,8 +14,8 @@
 #include "standalone/archive/recording.h"
 #include "standalone/archive/repair.h"
 #include "standalone/base/clock.h"
-#include "test/component/archive/archive_folder.h"
-#include "test/component/media/clips.h"
+#include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "test/component/media/clips.h"
+#include "test/support/footage/clips.h"
 
 #include <array>
 #include <cstdio>
@@ -8,7 +8,7 @@
 #include <stop_token>
 
 #include "standalone/media/demuxer.h"
-#include "test/component/archive/archive_folder.h"
+#include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
 

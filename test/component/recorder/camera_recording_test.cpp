@@ -1,0 +1,202 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Where one camera's events begin and end, on clocks that the test holds: nothing is lost between two of them, whatever
+// ends the first.
+#include "standalone/recorder/camera_recording.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "standalone/archive/recording.h"
+#include "standalone/upkeep/mount_folder.h"
+#include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
+
+namespace lookhaven::recorder {
+namespace {
+
+namespace fs = std::filesystem;
+using upkeep::RecordingState;
+
+constexpr std::int64_t kNoonMs = 1'772'366'400'000;
+constexpr int kFps = 25;
+
+class CameraRecordingTest : public testing::Test {
+  protected:
+    CameraRecordingTest() {
+        for (const int mount : {1, 2}) {
+            fs::create_directory(MountPath(mount));
+            upkeep::MountFolder::Mark(MountPath(mount), mount);
+        }
+        order_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
+        recording_.SetOrder(order_);
+    }
+
+    fs::path MountPath(int mount) const { return folder_ / std::to_string(mount); }
+    std::string StoreUrl() const { return "sqlite:" + (folder_ / "store.db").string(); }
+
+    // Until the recorder has numbers for events.
+    void OpenStore() {
+        store::Store::Migrate(StoreUrl());
+        for (int tries = 0; tries < 500 && !ledger_.HasId(); ++tries) {
+            ledger_.Refresh(4);
+            std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        }
+        ASSERT_TRUE(ledger_.HasId());
+    }
+
+    void Order(const std::function<void(RecordingOrder&)>& change) {
+        change(order_);
+        recording_.SetOrder(order_);
+    }
+
+    void Pass(double seconds, bool with_pictures = true) {
+        for (int i = 0; i < static_cast<int>(seconds * kFps); ++i) {
+            now_us_ += 1'000'000 / kFps;
+            if (with_pictures) {
+                const test::OwnedPacket& packet = clip_.packets[fed_++ % clip_.packets.size()];
+                recording_.Take({format_, packet.medium, packet.data, now_us_, packet.key_frame});
+            }
+            recording_.Tick();
+        }
+    }
+
+    std::vector<fs::path> Files() const {
+        std::vector<fs::path> files;
+        for (const auto& entry : fs::recursive_directory_iterator(folder_.Path())) {
+            if (entry.path().extension() == ".mkv") {
+                files.push_back(entry.path());
+            }
+        }
+        // By their number, which ends the name.
+        std::ranges::sort(files, {}, [](const fs::path& file) {
+            return std::stoi(file.stem().string().substr(file.stem().string().find('-') + 1));
+        });
+        return files;
+    }
+
+    const test::ArchiveFolder folder_;
+    std::int64_t now_us_ = 1'000'000'000;
+    std::int64_t wall_ahead_ms_ = kNoonMs;  // of the monotonic clock
+    int rooms_wanted_ = 0;
+    std::size_t fed_ = 0;
+    EventLedger ledger_{StoreUrl()};
+    RecordingOrder order_;
+    CameraRecording recording_{7,
+                               {ledger_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
+                                [this] { ++rooms_wanted_; }, 1'000'000}};
+    const test::Clip& clip_ = test::MakeClip(test::kH264);  // a key frame each second
+    const std::shared_ptr<const RunFormat> format_ = std::make_shared<RunFormat>(RunFormat{clip_.format.video, {}});
+};
+
+TEST_F(CameraRecordingTest, EventsEndWithoutLosingAFrameBetweenThem) {
+    OpenStore();
+    struct Row {
+        const char* what;
+        std::function<void()> happens;
+        std::vector<int> seconds;  // of the events, when it happens after 2.48 s of ten
+        std::int64_t step_ms = 0;
+    };
+    const Row rows[] = {
+        {"nothing", [] {}, {10}},
+        {"the segments are short", [&] { order_.plan.segment_s = 4; }, {4, 4, 2}},
+        {"the clock jumps", [&] { wall_ahead_ms_ += 3'000; }, {3, 7}, 3'000},
+        {"the clock is set back", [&] { wall_ahead_ms_ -= 3'600'000; }, {3, 7}, -3'600'000},
+        {"the clock is put right", [&] { wall_ahead_ms_ -= 1'900; }, {10}, -1'900},
+        {"another mount", [&] { order_.plan.mount_id = 2, order_.plan.mount = MountPath(2); }, {3, 7}},
+    };
+    std::size_t known = 0;
+    for (const Row& row : rows) {
+        SCOPED_TRACE(row.what);
+        const std::int64_t begin_ms = wall_ahead_ms_ + now_us_ / 1000;
+        fed_ = 0;
+        Pass(2.48);
+        row.happens();
+        recording_.SetOrder(order_);
+        Pass(7.52);
+        recording_.Close();
+        EXPECT_EQ(recording_.State(), RecordingState::kReady);
+        const std::vector<fs::path> files = Files();
+        ASSERT_EQ(files.size() - known, row.seconds.size());
+        std::int64_t expected_ms = begin_ms;
+        for (const int seconds : row.seconds) {
+            const archive::Recording event(files[known++]);
+            EXPECT_EQ(test::Probe(files[known - 1]), "h264," + std::to_string(seconds * kFps) + "\n");
+            EXPECT_FALSE(event.Grows());
+            EXPECT_NEAR(static_cast<double>(event.StartWallMs() - expected_ms), 40, 1);
+            expected_ms += seconds * 1000 + (expected_ms == begin_ms ? row.step_ms : 0);
+        }
+        order_.plan.segment_s = 60;
+        recording_.SetOrder(order_);
+        OpenStore();  // more numbers
+    }
+}
+
+TEST_F(CameraRecordingTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
+    Pass(2);
+    EXPECT_EQ(recording_.State(), RecordingState::kNoNumber) << "the store has not been there yet";
+    OpenStore();
+    const auto is_recorded_again = [&] {
+        fed_ = 0;
+        Pass(3);
+        EXPECT_EQ(recording_.State(), RecordingState::kRecording);
+        EXPECT_GT(recording_.OpenEvent(), 0);
+        OpenStore();
+    };
+    is_recorded_again();
+    struct Row {
+        RecordingState state;
+        bool with_pictures;
+        std::function<void()> happens, ends;
+    };
+    const fs::path hidden = folder_ / "hidden";
+    const Row rows[] = {
+        {RecordingState::kReady, false, [] {}, [] {}},
+        {RecordingState::kReady, true,
+         [&] { Order([](RecordingOrder& order) { order.plan.mode = store::RecordMode::kNever; }); },
+         [&] { Order([](RecordingOrder& order) { order.plan.mode = store::RecordMode::kAlways; }); }},
+        {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
+         [&] { fs::rename(hidden, MountPath(1)); }},
+        {RecordingState::kMountGone, true, [&] { upkeep::MountFolder::Mark(MountPath(1), 9); },
+         [&] { upkeep::MountFolder::Mark(MountPath(1), 1); }},
+        {RecordingState::kNoMount, true, [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 0; }); },
+         [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 1; }); }},
+    };
+    for (const Row& row : rows) {
+        SCOPED_TRACE(NameOf(row.state));
+        row.happens();
+        Pass(3, row.with_pictures);
+        EXPECT_EQ(recording_.State(), row.state);
+        EXPECT_EQ(recording_.OpenEvent(), 0);
+        row.ends();
+        is_recorded_again();
+    }
+    EXPECT_EQ(rooms_wanted_, 0);
+    recording_.Close();
+    for (const fs::path& file : Files()) {
+        EXPECT_FALSE(archive::Recording(file).Grows()) << file;
+        EXPECT_THAT(test::Probe(file), testing::MatchesRegex("h264,[0-9]+\n"));
+    }
+}
+
+TEST_F(CameraRecordingTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
+    OpenStore();
+    Order([](RecordingOrder& order) {
+        order.plan.mode = store::RecordMode::kNever;
+        order.plan.pre_s = 2;
+    });
+    Pass(4.6);
+    EXPECT_TRUE(Files().empty());
+    const std::int64_t alarm_s = (wall_ahead_ms_ + now_us_ / 1000) / 1000;
+    Order([&](RecordingOrder& order) { order.marks_until_s = alarm_s + 3; });
+    Pass(10);
+    ASSERT_EQ(Files().size(), 1U);
+    const archive::Recording event(Files().front());
+    EXPECT_EQ(event.Header(0).reason, store::kReasonAlarm);
+    EXPECT_LE(event.StartWallMs(), alarm_s * 1000 - 1000);
+    const std::int64_t end_ms = event.StartWallMs() + event.TimeOf(event.FrameCount() - 1);
+    EXPECT_NEAR(static_cast<double>(end_ms - (alarm_s + 3) * 1000), 0, 80);
+}
+
+}  // namespace
+}  // namespace lookhaven::recorder
