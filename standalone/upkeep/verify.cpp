@@ -2,6 +2,7 @@
 #include "standalone/upkeep/verify.h"
 
 #include <algorithm>
+#include <array>
 #include <limits>
 #include <map>
 #include <set>
@@ -70,7 +71,7 @@ Inspection Inspect(const std::filesystem::path& path) {
     try {
         found = WalkRecording(path);
     } catch (const archive::ArchiveError& failure) {
-        result.problem = failure.what();
+        result.problem = "the recording " + path.string() + " cannot be read: " + failure.what();
     }
     if (found == indexed && result.problem.empty()) {
         return result;
@@ -152,7 +153,7 @@ class Verification {
         const std::optional<archive::FileName> name = archive::ParsePath(row.path);
         if (!name || name->event != row.id || name->kind != archive::FileKind::kRecording) {
             Report("the path of event " + std::to_string(row.id) + " names no recording of its own: " + row.path,
-                   [] { return ""; });
+                   [&] { return events_.Remove(std::array{row.id}) > 0 ? "removed the event" : ""; });
             return;
         }
         if (!mount.Has(*name)) {

@@ -2,9 +2,7 @@
 //
 // The command line's view of recordings: events, marks, mounts, groups, plans, made-up events, export and verify.
 #include <chrono>
-#include <cstdio>
 #include <fstream>
-#include <memory>
 #include <sstream>
 
 #include <json/json.h>
@@ -12,8 +10,6 @@
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
-#include "standalone/media/recording_writer.h"
-#include "standalone/media/source.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
@@ -21,11 +17,11 @@
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/users.h"
 #include "test/component/cli/program.h"
+#include "test/support/footage/clips.h"
 
 namespace lookhaven::cli {
 namespace {
 
-using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
 
@@ -240,60 +236,29 @@ TEST_F(RecordingsTest, MadeUpEventsFillATimeAndGoAsOne) {
     EXPECT_TRUE(events.Find(kept));
 }
 
-// A second of H.264 and AAC, as the recorder leaves it on the disk.
-void Record(const std::filesystem::path& file) {
-    std::filesystem::create_directories(file.parent_path());
-    const auto source = media::OpenSource("test:h264?size=160x120&fps=25&gop=5&audio=aac", {}, {});
-    std::optional<media::RecordingWriter> writer;
-    for (int frames = 0; frames < 25;) {
-        const media::Packet packet = source->Next();
-        if (!writer && packet.medium == media::Medium::kVideo) {
-            writer.emplace(file, media::RecordingFormat{*packet.format, source->Audio()}, kStart * 1000, 1);
-        }
-        if (writer) {
-            writer->Write(packet);
-            frames += packet.medium == media::Medium::kVideo ? 1 : 0;
-        }
-    }
-    writer->Close();
-    for (const std::filesystem::path& made : {file, archive::IndexPathOf(file)}) {
-        // What has only just been written may still get its row.
-        std::filesystem::last_write_time(made, std::filesystem::file_time_type::clock::now() - std::chrono::hours(24));
-    }
-}
-
-// What ffprobe counts: "video,25" and so on, a line a stream.
-std::string Probe(const std::filesystem::path& file) {
-    const std::string command =
-        "ffprobe -v error -count_frames -show_entries stream=codec_type,nb_read_frames -of csv=p=0 '" + file.string() +
-        "' 2>&1";
-    const std::unique_ptr<FILE, int (*)(FILE*)> pipe(::popen(command.c_str(), "r"), &::pclose);
-    std::string text;
-    for (int c = 0; (c = std::fgetc(pipe.get())) != EOF;) {
-        text += static_cast<char>(c);
-    }
-    return text;
-}
-
 TEST_F(RecordingsTest, ARecordingIsTakenInExportedAndMissedWhenItIsGone) {
     store::Store store = Open();
     const int id = store::Events(store).NextId();
     const std::string path = archive::PathOf({1, kStart, id, archive::FileKind::kRecording});
-    Record(home_ / "recordings" / path);
+    test::Record(test::MakeClip(test::kH264, "-c:a aac -ar 16000"), home_ / "recordings" / path);
+    for (const auto& made : std::filesystem::recursive_directory_iterator(home_ / "recordings")) {
+        // What has only just been written may still get its row.
+        std::filesystem::last_write_time(made, std::filesystem::file_time_type::clock::now() - std::chrono::hours(24));
+    }
     const std::string number = std::to_string(id);
     const auto whole = folder_ / "whole.mkv";
     const auto silent = folder_ / "silent.mkv";
     Play({{"verify", "", 1, "verify --repair", ""},
           {"event show " + number, "", 66, "no event", ""},
           {"verify --repair", "", 0, "done:", ""},
-          {"verify --json", "", 0, "\"frames\" : 25", ""},
-          {"event show " + number, "", 0, "H.264 160x120, 25 frames", "cannot be read"},
+          {"verify --json", "", 0, "\"frames\" : 100", ""},
+          {"event show " + number, "", 0, "H.264 160x120, 100 frames", "cannot be read"},
           {"event export " + number + " " + whole.string(), "", 0, "copied", ""},
           {"event export " + number + " " + whole.string(), "", 73, "already a file", ""},
           {"event export " + number + " --no-sound " + silent.string(), "", 0, "copied", ""},
           {"event export " + number + " /no/such/x.mkv", "", 66, "/no/such/x.mkv", ""}});
-    EXPECT_THAT(Probe(whole), AllOf(HasSubstr("video,25"), HasSubstr("audio,")));
-    EXPECT_EQ(Probe(silent), "video,25\n");
+    EXPECT_THAT(test::Probe(whole), testing::MatchesRegex("h264,100\naac,6[0-9]\n"));
+    EXPECT_EQ(test::Probe(silent), "h264,100\n");
     std::filesystem::resize_file(home_ / "recordings" / path, 100);
     Play({{"event export " + number + " " + (folder_ / "x").string(), "", 65, "", ""}});
     std::filesystem::remove(home_ / "recordings" / path);
