@@ -31,8 +31,9 @@ def descendants(pid):
 
 
 def cpu_nanos(pids):
-    """Processor time that the processes have used so far; single-threaded ones only."""
-    return sum(int(pathlib.Path(f"/proc/{pid}/schedstat").read_text().split()[0]) for pid in pids)
+    """Processor time that the threads of the processes have used so far; without those that have ended."""
+    threads = (thread for pid in pids for thread in pathlib.Path(f"/proc/{pid}/task").iterdir())
+    return sum(int((thread / "schedstat").read_text().split()[0]) for thread in threads)
 
 
 def private_kib(pid):

@@ -5,6 +5,7 @@
 #include <string>
 #include <utility>
 
+#include "standalone/base/blocked_signals.h"
 #include "standalone/media/jpeg.h"
 #include "standalone/media/jpeg_encoder.h"
 #include "standalone/media/source.h"
@@ -45,8 +46,8 @@ void ReplaceLengths(std::span<std::uint8_t> frame) {
 
 class AvFrameDecoder : public FrameDecoder {
   public:
-    explicit AvFrameDecoder(Codec codec)
-        : context_(OpenVideoDecoder(codec)),
+    AvFrameDecoder(Codec codec, int threads)
+        : context_(OpenVideoDecoder(codec, threads)),
           packet_(OwnAv(av_packet_alloc())),
           frame_(OwnAv(av_frame_alloc())),
           next_(OwnAv(av_frame_alloc())) {}
@@ -69,7 +70,12 @@ class AvFrameDecoder : public FrameDecoder {
     }
 
     std::optional<std::int64_t> Take() override {
-        if (avcodec_receive_frame(context_.get(), next_.get()) < 0) {
+        int result = AVERROR_INVALIDDATA;
+        // What another thread could not decode is told here, once for each frame.
+        for (int i = 0; i <= context_->thread_count && result == AVERROR_INVALIDDATA; ++i) {
+            result = avcodec_receive_frame(context_.get(), next_.get());
+        }
+        if (result < 0) {
             return std::nullopt;  // and the picture that was taken last stays
         }
         std::swap(frame_, next_);
@@ -95,7 +101,7 @@ class AvFrameDecoder : public FrameDecoder {
 
 }  // namespace
 
-AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec) {
+AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads) {
     PrepareAv();
     const AVCodecID id = codec == Codec::kH264   ? AV_CODEC_ID_H264
                          : codec == Codec::kH265 ? AV_CODEC_ID_HEVC
@@ -105,14 +111,16 @@ AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec) {
         throw SourceError(std::string("needs libavcodec with ") + avcodec_get_name(id));
     }
     AvPtr<AVCodecContext> context = OwnAv(avcodec_alloc_context3(decoder));
-    context->thread_count = 1;
+    context->thread_count = threads;
+    context->thread_type = FF_THREAD_FRAME;
     context->max_pixels = std::int64_t{kMaxSidePixels} * kMaxSidePixels;
+    const base::BlockedSignals blocked;
     CheckAv(avcodec_open2(context.get(), decoder, nullptr), "cannot open the decoder");
     return context;
 }
 
-std::unique_ptr<FrameDecoder> OpenFrameDecoder(Codec codec) {
-    return std::make_unique<AvFrameDecoder>(codec);
+std::unique_ptr<FrameDecoder> OpenFrameDecoder(Codec codec, int threads) {
+    return std::make_unique<AvFrameDecoder>(codec, threads);
 }
 
 }  // namespace lookhaven::media

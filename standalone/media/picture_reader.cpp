@@ -7,6 +7,13 @@
 
 namespace lookhaven::media {
 
+namespace {
+
+// One decodes the next picture while the other codes this one.
+constexpr int kThreads = 2;
+
+}  // namespace
+
 std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
     const archive::RecordedFrame& frame = recording_.At(index);
     const std::string& codec = recording_.Header(frame.segment).codec;
@@ -19,7 +26,7 @@ std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
         return entry.size;
     }
     if (decoder_ == nullptr || codec != codec_) {
-        decoder_ = LoadLibavLibrary().OpenDecoder(codec);
+        decoder_ = LoadDecoderLibrary().OpenDecoder(codec, recording_.Grows() ? 1 : kThreads);
         codec_ = codec;
         is_inside_ = false;
     }

@@ -4,7 +4,8 @@
 //
 // Why so        Motion JPEG is one read from the file, without libav. Other codecs are decoded from the key frame before;
 //               the decoder's state is kept, so frames in a row are decoded once, and a jump forward decodes on from here
-//               or from a later key frame, whichever is nearer.
+//               or from a later key frame, whichever is nearer. A second thread decodes ahead, unless that is waiting for
+//               frames of a recording that grows.
 #pragma once
 
 #include <cstddef>
@@ -15,7 +16,7 @@
 #include <vector>
 
 #include "standalone/archive/recording.h"
-#include "standalone/media/libav_library.h"
+#include "standalone/media/libav_libraries.h"
 
 namespace lookhaven::media {
 

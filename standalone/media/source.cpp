@@ -32,26 +32,6 @@ std::unique_ptr<Source> Open(const std::string& url, const SourceOptions& option
 
 }  // namespace
 
-const char* CodecName(Codec codec) {
-    switch (codec) {
-    case Codec::kMjpeg:
-        return "MJPEG";
-    case Codec::kH264:
-        return "H264";
-    case Codec::kH265:
-        return "H265";
-    case Codec::kAac:
-        return "AAC";
-    case Codec::kPcmMulaw:
-        return "PCMU";
-    case Codec::kPcmAlaw:
-        return "PCMA";
-    case Codec::kOpus:
-        return "OPUS";
-    }
-    return "";
-}
-
 std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop) {
     PrepareAv();
     const base::BlockedSignals blocked;  // for the threads that libav may start

@@ -11,7 +11,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
-#include "standalone/media/libav_library.h"
+#include "standalone/media/libav_libraries.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
@@ -90,7 +90,7 @@ void Download(binding::RequestContext& context, std::optional<store::MarkKind> k
     if (archive::Recording(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }
-    const media::LibavLibrary& library = media::LoadLibavLibrary();
+    const media::RemuxLibrary& library = media::LoadRemuxLibrary();
     std::fwrite(head.data(), 1, head.size(), stdout);
     std::fflush(stdout);
     library.Copy(path, STDOUT_FILENO, options);

@@ -15,7 +15,7 @@
 #include "platform/live/livestream.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/base/log.h"
-#include "standalone/media/libav_library.h"
+#include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
 
 namespace lookhaven::webapi {
@@ -52,7 +52,7 @@ std::vector<std::uint8_t> Jpeg(KeyFrame frame) {
         return std::move(frame.data);
     }
     try {
-        return media::LoadLibavLibrary().Still(frame.codec, frame.data);
+        return media::LoadDecoderLibrary().Still(frame.codec, frame.data);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());
         throw Failure(504, "the camera's picture cannot be decoded");

@@ -6,7 +6,9 @@ import base64
 import contextlib
 import os
 import pathlib
+import re
 import shutil
+import signal
 import subprocess
 import tempfile
 import time
@@ -259,6 +261,12 @@ class PlaybackTest(unittest.TestCase):
                 self.assertFalse([path for path in open_files if "lookhaven.db" in path])
                 self.assertTrue([path for path in open_files if path.endswith(event["name"])], open_files)
                 self.assertEqual(loads_decoder(player), decodes)
+                helpers = [task for task in pathlib.Path(f"/proc/{player}/task").iterdir() if int(task.name) != player]
+                self.assertEqual(bool(helpers), decodes)
+                for task in helpers:
+                    blocked = int(re.search(r"SigBlk:\s(\w+)", (task / "status").read_text())[1], 16)
+                    for number in (signal.SIGTERM, signal.SIGUSR1, signal.SIGUSR2):
+                        self.assertTrue(blocked >> (number - 1) & 1, "the player itself must be woken")
         self.assertFalse(loads_decoder(self.server.part("webapi")), "each fork would pay for it")
 
     def test_a_recording_that_is_deleted_plays_on(self):

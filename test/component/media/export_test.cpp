@@ -10,7 +10,7 @@
 
 #include "standalone/archive/span_file.h"
 #include "standalone/base/file.h"
-#include "standalone/media/libav_library.h"
+#include "standalone/media/libav_libraries.h"
 #include "standalone/media/source.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
@@ -56,7 +56,7 @@ TEST_F(ExportOf, RecordingsAndSpansToFilesAndPipes) {
     for (const Row& row : rows) {
         const std::filesystem::path path = folder_ / "1970-01-01" / row.recording;
         const base::FileDescriptor file = base::OpenFile(out_, O_RDWR | O_CREAT | O_TRUNC);
-        LoadLibavLibrary().Copy(path, file.Get(), row.options);
+        LoadRemuxLibrary().Copy(path, file.Get(), row.options);
         EXPECT_THAT(Probe(out_), testing::MatchesRegex(row.probed)) << path;
         EXPECT_THAT(Shell("ffprobe -v error -show_entries format=duration -of csv=p=0 " + out_.string()),
                     testing::StartsWith(row.duration))
@@ -73,7 +73,7 @@ TEST_F(ExportOf, RecordingsAndSpansToFilesAndPipes) {
                 received.append(block, static_cast<std::size_t>(got));
             }
         });
-        LoadLibavLibrary().Copy(path, to.Get(), row.options);
+        LoadRemuxLibrary().Copy(path, to.Get(), row.options);
         to.Reset();
         receiver.join();
         Write(out_, received);
@@ -83,7 +83,7 @@ TEST_F(ExportOf, RecordingsAndSpansToFilesAndPipes) {
 
 TEST_F(ExportOf, NothingAndToNobodyFails) {
     const std::filesystem::path recording = folder_ / "1970-01-01/000010-1.mkv";
-    const LibavLibrary& libav = LoadLibavLibrary();
+    const RemuxLibrary& libav = LoadRemuxLibrary();
     const base::FileDescriptor null = base::OpenFile("/dev/null", O_WRONLY);
     EXPECT_THROW(libav.Copy(recording, null.Get(), {true, kStartMs + 5000, {}}), SourceError);
     EXPECT_THROW(libav.Copy(folder_ / "none.mkv", null.Get(), {}), std::system_error);

@@ -1,10 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/media/libav_library.h"
-
 #include <string>
 
 #include "standalone/media/frame_decoder.h"
-#include "standalone/media/remux.h"
+#include "standalone/media/libav_libraries.h"
 #include "standalone/media/source.h"
 #include "standalone/media/still.h"
 
@@ -21,16 +19,13 @@ Codec CodecOfName(std::string_view name) {
     throw SourceError("no decoder for " + std::string(name));
 }
 
-class Library : public LibavLibrary {
+class Library : public DecoderLibrary {
   public:
     std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const override {
         return JpegOfKeyFrame(CodecOfName(codec), frame);
     }
-    std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec) const override {
-        return OpenFrameDecoder(CodecOfName(codec));
-    }
-    void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const override {
-        Export(recording, output, options);
+    std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const override {
+        return OpenFrameDecoder(CodecOfName(codec), threads);
     }
 };
 
@@ -38,7 +33,7 @@ class Library : public LibavLibrary {
 
 }  // namespace lookhaven::media
 
-extern "C" __attribute__((visibility("default"))) const lookhaven::media::LibavLibrary* LookhavenLibav() {
+extern "C" __attribute__((visibility("default"))) const lookhaven::media::DecoderLibrary* LookhavenDecoder() {
     static const lookhaven::media::Library library;
     return &library;
 }

@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What request processes need of libav, as a shared library that only they load.
+// What request processes need of libav, as shared libraries that only they load.
 //
 // Why so        libav brings hundreds of mappings along, and each of them makes every fork dearer. A host that forks for
-//               each request loads this library in the one request process that decodes or copies.
+//               each request loads such a library in the one request process that decodes or copies. There are two, since
+//               loading is most of the wait for a first picture, and decoding does well without libav's formats of files.
 #pragma once
 
 #include <cstddef>
@@ -19,10 +20,7 @@
 
 namespace lookhaven::media {
 
-constexpr const char* kLibavLibrary = "liblookhaven-libav.so";
-constexpr const char* kLibavFunction = "LookhavenLibav";  // () -> const LibavLibrary*
-
-// Decodes a row of H.264 or H.265 frames and makes JPEG pictures of the ones that are asked for. One thread.
+// Decodes a row of H.264 or H.265 frames and makes JPEG pictures of the ones that are asked for. To be used by one thread.
 class FrameDecoder {
   public:
     virtual ~FrameDecoder() = default;
@@ -38,21 +36,29 @@ class FrameDecoder {
     virtual std::size_t Encode(std::span<std::uint8_t> jpeg) = 0;
 };
 
-class LibavLibrary {
+class DecoderLibrary {
   public:
-    virtual ~LibavLibrary() = default;
+    virtual ~DecoderLibrary() = default;
 
     // Codecs are spelled as CodecName does.
 
     // As JpegOfKeyFrame of still.h.
     virtual std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const = 0;
-    // Throws SourceError for a codec that cannot be decoded.
-    virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec) const = 0;
+    // With more threads than one, pictures come so many frames later as there are others: not for a row that grows at its
+    // end. Throws SourceError for a codec that cannot be decoded.
+    virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const = 0;
+};
+
+class RemuxLibrary {
+  public:
+    virtual ~RemuxLibrary() = default;
+
     // As Export of remux.h.
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
 };
 
-// Loads the library, for the rest of the process's life. Throws SourceError.
-const LibavLibrary& LoadLibavLibrary();
+// These load their library for the rest of the process's life. Throw SourceError.
+const DecoderLibrary& LoadDecoderLibrary();
+const RemuxLibrary& LoadRemuxLibrary();
 
 }  // namespace lookhaven::media
