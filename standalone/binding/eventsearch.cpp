@@ -91,13 +91,17 @@ int ReadRecLog(const std::string& storagePath, long from, int duration, unsigned
             return -1;
         }
         const std::span<std::uint8_t> seconds(buffer, static_cast<std::size_t>(duration));
-        std::ranges::fill(seconds, std::uint8_t{0});
-        std::vector<std::uint8_t> found(seconds.size());
+        std::vector<std::uint8_t> more;
         bool read = false;
         for (const store::Mount& mount : mounts) {
-            if (archive::ReadRecordingLog(std::filesystem::path(mount.path) / asked.filename(), from, found)) {
-                read = true;
-                std::ranges::transform(seconds, found, seconds.begin(), std::ranges::max);
+            const std::filesystem::path folder = std::filesystem::path(mount.path) / asked.filename();
+            if (!read) {
+                read = archive::ReadRecordingLog(folder, from, seconds);
+                continue;
+            }
+            more.resize(seconds.size());
+            if (archive::ReadRecordingLog(folder, from, more)) {
+                std::ranges::transform(seconds, more, seconds.begin(), std::ranges::max);
             }
         }
         return read ? 0 : -1;

@@ -28,11 +28,14 @@ std::optional<Json::Value> StrictJson(const std::string& text) {
     return std::nullopt;
 }
 
-std::string CompactText(const Json::Value& value) {
+constexpr unsigned int kAllDigits = 17;
+constexpr unsigned int kSafeDigits = 15;  // the most that every decimal fraction keeps
+
+std::string CompactText(const Json::Value& value, unsigned int digits) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
     builder["emitUTF8"] = true;
-    builder["precision"] = 15;  // the most digits that every decimal fraction keeps
+    builder["precision"] = digits;
     return Json::writeString(builder, value);
 }
 
@@ -43,7 +46,8 @@ bool IsReproduced(const Json::Value& value, std::string_view text) {
                            [text](const Json::Value& member) { return IsReproduced(member, text); });
     }
     const auto start = static_cast<std::size_t>(value.getOffsetStart());
-    return CompactText(value) == text.substr(start, static_cast<std::size_t>(value.getOffsetLimit()) - start);
+    return CompactText(value, kSafeDigits) ==
+           text.substr(start, static_cast<std::size_t>(value.getOffsetLimit()) - start);
 }
 
 }  // namespace
@@ -59,11 +63,15 @@ Json::Value JsonFromText(std::string_view name, const std::string& text) {
     if (!text.empty() && kFirstBytes.find(text.front()) != kFirstBytes.npos && !IsAlwaysText(name)) {
         std::optional<Json::Value> value = StrictJson(text);
         const bool is_scalar = value && !value->isObject() && !value->isArray();
-        if (value && (is_scalar ? CompactText(*value) == text : IsReproduced(*value, text))) {
+        if (value && (is_scalar ? CompactText(*value, kSafeDigits) == text : IsReproduced(*value, text))) {
             return *std::move(value);
         }
     }
     return text;
+}
+
+std::string SuccessText(const Json::Value& data) {
+    return "{\"data\":" + CompactText(data, kAllDigits) + ",\"success\":true}";
 }
 
 }  // namespace lookhaven::binding
@@ -129,16 +137,12 @@ bool APIRequest::HasAppPriv(const std::string& application) const {
 APIResponse::APIResponse(Context& context) : m_pContext(&context) {}
 
 void APIResponse::SetSuccess(const Json::Value& data) {
-    Json::Value& answer = m_pContext->answer.emplace(Json::objectValue);
-    answer["success"] = true;
-    answer["data"] = data;
+    m_pContext->answer = lookhaven::binding::SuccessText(data);
 }
 
 void APIResponse::SetError(int code, const Json::Value& data) {
-    Json::Value& answer = m_pContext->answer.emplace(Json::objectValue);
-    answer["success"] = false;
-    answer["error"]["code"] = code;
-    answer["error"]["data"] = data;
+    m_pContext->answer = R"({"error":{"code":)" + std::to_string(code) + R"(,"data":)" + CompactText(data, kAllDigits) +
+                         R"(},"success":false})";
 }
 
 void APIResponse::SetEnableOutput(bool enable) {

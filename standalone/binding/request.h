@@ -35,6 +35,9 @@ LH_PLATFORM_API bool IsAlwaysText(std::string_view name);
 // a parameter that IsAlwaysText.
 LH_PLATFORM_API Json::Value JsonFromText(std::string_view name, const std::string& text);
 
+// {"data": data, "success": true}, compact. Throws Json::Exception for what no JSON can hold.
+LH_PLATFORM_API std::string SuccessText(const Json::Value& data);
+
 }  // namespace lookhaven::binding
 
 struct VEXO::APIRequest::Context {
@@ -46,6 +49,6 @@ struct VEXO::APIRequest::Context {
 };
 
 struct VEXO::APIResponse::Context {
-    std::optional<Json::Value> answer;
+    std::optional<std::string> answer;  // as JSON: a list of thousands of events is not copied first
     bool output_enabled = true;
 };

@@ -4,6 +4,8 @@
 #include <array>
 #include <utility>
 
+#include "standalone/binding/request.h"
+
 namespace lookhaven::webapi {
 
 namespace {
@@ -32,30 +34,20 @@ const char* Reason(int status) {
 
 }  // namespace
 
-std::string JsonAnswer(int status, const Json::Value& body, const std::string& extra) {
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "";
-    builder["emitUTF8"] = true;
-    const std::string text = Json::writeString(builder, body);
+std::string JsonAnswer(int status, const std::string& body, const std::string& extra) {
     return "Status: " + std::to_string(status) + ' ' + Reason(status) +
            "\r\nContent-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
-           std::to_string(text.size()) + "\r\n" + extra + "\r\n" + text;
+           std::to_string(body.size()) + "\r\n" + extra + "\r\n" + body;
 }
 
 std::string SuccessAnswer(const Json::Value& data, const std::string& extra) {
-    Json::Value body;
-    body["success"] = true;
-    body["data"] = data;
-    return JsonAnswer(200, body, extra);
+    return JsonAnswer(200, binding::SuccessText(data), extra);
 }
 
 std::string FailureAnswer(const Failure& failure) {
-    Json::Value body;
-    body["success"] = false;
-    body["error"]["code"] = failure.Status();
-    body["error"]["data"] = Json::nullValue;
-    body["error"]["message"] = failure.what();
-    return JsonAnswer(failure.Status(), body);
+    return JsonAnswer(failure.Status(), R"({"error":{"code":)" + std::to_string(failure.Status()) +
+                                            R"(,"data":null,"message":)" + Json::valueToQuotedString(failure.what()) +
+                                            R"(},"success":false})");
 }
 
 }  // namespace lookhaven::webapi

@@ -20,8 +20,8 @@ class Failure : public std::runtime_error {
     int status_;
 };
 
-// The whole answer. extra: further head lines, each ending in CR LF.
-std::string JsonAnswer(int status, const Json::Value& body, const std::string& extra = "");
+// The whole answer with a body of JSON. extra: further head lines, each ending in CR LF.
+std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
 
 // {"success": true, "data": data}
 std::string SuccessAnswer(const Json::Value& data, const std::string& extra = "");
