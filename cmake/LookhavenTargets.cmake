@@ -21,15 +21,16 @@ function(lookhaven_library name)
     target_link_libraries(${name} PUBLIC lookhaven_options)
 endfunction()
 
-# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>]): a GoogleTest program
-# that ctest runs as one test under the given label (unit, component, system).
+# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE]): a GoogleTest
+# program that ctest runs as one test under the given label (unit, component, system); ALONE: not beside others, for it
+# looks at times.
 function(lookhaven_test name label)
-    cmake_parse_arguments(arg "" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
+    cmake_parse_arguments(arg "ALONE" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     target_link_libraries(${name} PRIVATE lookhaven_options ${arg_LIBRARIES} GTest::gmock GTest::gtest GTest::gtest_main)
     add_test(NAME ${name} COMMAND ${name})
     if(NOT arg_TIMEOUT)
         set(arg_TIMEOUT 120)
     endif()
-    set_tests_properties(${name} PROPERTIES LABELS ${label} TIMEOUT ${arg_TIMEOUT})
+    set_tests_properties(${name} PROPERTIES LABELS ${label} TIMEOUT ${arg_TIMEOUT} RUN_SERIAL ${arg_ALONE})
 endfunction()
