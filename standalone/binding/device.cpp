@@ -28,10 +28,13 @@ store::RecordingServers Servers() {
     return store::RecordingServers(RequestContext::Current().Records());
 }
 
-// A camera's id on the server that owns it; its id here when it is this host's own.
-int IdOnOwner(int camera_id) {
+// A camera's id on the server, 0 for this host; 0 when it is another's.
+int IdOnServer(int camera_id, int server_id) {
+    if (server_id == 0 || camera_id == 0) {
+        return camera_id;
+    }
     const auto remote = Servers().FindCamera(camera_id);
-    return remote ? remote->id_on_server : camera_id;
+    return remote && remote->server_id == server_id ? remote->id_on_server : 0;
 }
 
 std::map<int, store::PortCounts> PortsOf(const std::string& ids) {
@@ -79,7 +82,7 @@ int POS::LoadByIdOnRecServer(int idOnServer, int serverId) {
         if (!found) {
             return kNotFound;
         }
-        m_PairedCamIdOnRec = IdOnOwner(found->camera_id);
+        m_PairedCamIdOnRec = IdOnServer(found->camera_id, serverId);
         return 0;
     });
 }

@@ -6,6 +6,7 @@
 //               for every kind of access.
 #include <algorithm>
 #include <map>
+#include <stdexcept>
 
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/request_context.h"
@@ -95,6 +96,13 @@ bool IsUser(int profile_id) {
     return profile_id != 0 && profile_id != static_cast<int>(PAIR_AUTH_UID);
 }
 
+// What is denied to nobody is everything, which no set can say: such a request fails.
+void RequireSomebody(int profile_id) {
+    if (profile_id == 0) {
+        throw std::runtime_error("the rights of an account that is unknown were asked for");
+    }
+}
+
 store::Users Users() {
     return store::Users(RequestContext::Current().Records());
 }
@@ -121,6 +129,7 @@ int PrivProfile::GetPrivilege() const {
 
 // No list hides a camera here, so withHidden adds none.
 std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool) const {
+    RequireSomebody(m_pData->id);
     const auto denied = m_pData->denied_cameras.find(type);
     return denied == m_pData->denied_cameras.end() ? std::set<int>{} : denied->second;
 }
@@ -132,10 +141,12 @@ std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
 }
 
 std::set<int> PrivProfile::GetInaEmapIdSet(ITEM_PRIV_TYPE, bool) const {
+    RequireSomebody(m_pData->id);
     return IsUser(m_pData->id) ? Users().DeniedItems(m_pData->id, store::DeniableItem::kEmap) : std::set<int>{};
 }
 
 std::set<int> PrivProfile::GetInaIOIdSet(bool) const {
+    RequireSomebody(m_pData->id);
     return IsUser(m_pData->id) ? Users().DeniedItems(m_pData->id, store::DeniableItem::kIoModule) : std::set<int>{};
 }
 
@@ -175,6 +186,10 @@ PrivProfile PrivProfileGetByUid(unsigned int uid) {
         data->privilege = static_cast<int>(user->privilege);
         for (const store::CameraAccess kind : store::kEveryAccess) {
             data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
+            if (uid == RequestContext::Current().Caller()) {
+                data->denied_cameras[static_cast<int>(kind)].merge(
+                    std::set(RequestContext::Current().RenouncedCameras()));
+            }
         }
         return PrivProfile(data);
     });

@@ -8,6 +8,7 @@
 #include "platform/privilege/privprofile.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
 #include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
@@ -74,16 +75,18 @@ std::string SlaveHx::GetCookie() const {
     return m_Cookie;
 }
 
-// The cookie is "<timestamp>-<token>": a client that asks the server itself sends the two apart.
+// The cookie is "<timestamp>-<token>": a client that asks the server itself sends the two apart. Whoever has it may see all of
+// that server for as long as it is good, so nobody gets one but those who administer this host; others have it relayed.
 SlaveHxMgr::SlaveHxMgr(bool load) {
     if (!load) {
         return;
     }
     OrFailure("SlaveHxMgr", 0, [&] {
         const std::string timestamp = std::to_string(UtcSeconds());
+        const bool may_have_token = lookhaven::binding::IsManager();
         for (const store::RecordingServer& server : Servers().List()) {
             if (!server.address.empty()) {
-                const std::string secret = Servers().FindSecret(server.id);
+                const std::string secret = may_have_token ? Servers().FindSecret(server.id) : "";
                 const std::string cookie =
                     secret.empty() ? "" : timestamp + "-" + store::MakePairToken(secret, timestamp);
                 m_Servers.emplace(server.id, SlaveHx(server.address, server.port, cookie));
@@ -97,7 +100,9 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
 std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabled, bool onlySameVersion) const {
     std::map<int, SlaveHx> servers = m_Servers;
     if (onlyOnline || onlyEnabled || onlySameVersion) {
-        std::erase_if(servers, [](const auto& entry) { return entry.second.GetCookie().empty(); });
+        std::erase_if(servers, [](const auto& entry) {
+            return OrFailure("GetSlaveHxMap", true, [&] { return Servers().FindSecret(entry.first).empty(); });
+        });
     }
     return servers;
 }
@@ -107,7 +112,7 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
     return OrFailure("IsAuthPairMatch", false, [&] {
         const std::int64_t now = UtcSeconds();
         bool matches = false;
-        for (const std::string& secret : Servers().Secrets()) {
+        for (const std::string& secret : Servers().AskersSecrets()) {
             matches |= store::PairTokenMatches(cookie, timestamp, secret, now);
         }
         if (matches) {

@@ -63,7 +63,7 @@ class Devices {
     int Add(const Device& device);
     // Replaces name, paired camera and ports of the device. Throws InvalidRecord or NotFound.
     void Update(const Device& device);
-    // Items of it stay on their maps, where nobody sees them. Throws NotFound.
+    // Items of it stay on their maps, where nobody sees them but a door's, which is shown without a state. Throws NotFound.
     void Remove(EmapItemType kind, int id);
 
     std::optional<Device> Find(EmapItemType kind, int id);

@@ -93,7 +93,8 @@ void EmapPictures::Put(int emap_id, std::string_view bytes) {
         throw InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
     }
     Emaps emaps(store_);
-    if (!emaps.Find(emap_id)) {
+    const std::optional<Emap> before = emaps.Find(emap_id);
+    if (!before) {
         throw NotFound("there is no e-map " + std::to_string(emap_id));
     }
     const std::string name = std::to_string(emap_id) + "-" + RandomHex(8) + "." + std::string(type);
@@ -106,6 +107,9 @@ void EmapPictures::Put(int emap_id, std::string_view bytes) {
         fs::remove(folder_ / name, ignored);
         throw;
     }
+    // Who has read the map's row just now still looks for the picture that was: it grows old from here.
+    std::error_code ignored;
+    fs::last_write_time(folder_ / before->image, fs::file_time_type::clock::now(), ignored);
     Sweep();
 }
 

@@ -188,12 +188,13 @@ std::string RecordingServers::FindSecret(int id) {
     });
 }
 
-std::vector<std::string> RecordingServers::Secrets() {
+std::vector<std::string> RecordingServers::AskersSecrets() {
     return connection_.Read([](soci::session& sql) {
         std::vector<std::string> secrets;
         std::string secret;
         soci::statement rows =
-            (sql.prepare << "select secret from servers where enabled = 1 order by id", soci::into(secret));
+            (sql.prepare << "select secret from servers where enabled = 1 and address = '' order by id",
+             soci::into(secret));
         rows.execute();
         while (rows.fetch()) {
             secrets.push_back(secret);

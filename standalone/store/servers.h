@@ -32,7 +32,7 @@ struct RemoteCamera {
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) A secret comes out of Secrets and FindSecret alone, never with the record.
+//               (2) A secret comes out of AskersSecrets and FindSecret alone, never with the record.
 class RecordingServers {
   public:
     // The store must outlive this object.
@@ -51,8 +51,9 @@ class RecordingServers {
 
     // Empty for an unknown or disabled server.
     std::string FindSecret(int id);
-    // Of all enabled servers.
-    std::vector<std::string> Secrets();
+    // Of the enabled servers that ask this host, which are those without an address. What this host shows to a server that it
+    // asks itself lets nobody in here.
+    std::vector<std::string> AskersSecrets();
 
     // Gives the server's camera an id on this host, or renews what is known of one that has it; returns the id. Throws
     // NotFound for an unknown server, InvalidRecord.

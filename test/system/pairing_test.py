@@ -102,6 +102,13 @@ class PairingTest(unittest.TestCase):
             timestamp, _, cookie = item["hxCookie"].partition("-")
             self.assertEqual(cookie, self.token(timestamp))
             self.assertNotIn(self.secret, answer.body.decode())
+        items = self.watcher.request(play(2, itemType=1), "viewer").json["data"]["items"]
+        self.assertEqual([item["hxCookie"] for item in items if item["hxId"] == "1"], [""], "it would open all of that server")
+        # What is shown to the owner opens nothing at home.
+        headers = {"Cookie": f"timestamp={timestamp}"}
+        self.assertEqual(
+            self.watcher.request(play(1, snapshot=1, client="REC_SERVER", cookie=cookie), headers=headers).status, 401
+        )
         log = "".join(path.read_text() for home in (self.owner.home, self.watcher.home) for path in (home / "log").iterdir())
         self.assertNotIn(self.secret, log)
         self.assertNotIn("cookie=", log)

@@ -187,6 +187,12 @@ const FramesRow kFrames[] = {
      Params({{"interval", 9}}) + [](auto& p) { p.frame_rate = 0.5; },
      {},
      "0:P0 0:P0 0:P0 0:P0 0:P0 "},
+    {"changed to 0 and below",
+     kByIndex,
+     Params({{"playrate", 3}}),
+     {{2, ClientSets(0)}, {4, ClientSets(-2)}},
+     "0:P0 3:P3 4:P4 5:P5 6:P6 "},
+    {"rate refused", kByIndex, [](auto& p) { p.progress_result = 1; }, {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
     {"no pause", kByIndex, Nothing, {{2, Signal(SIGUSR2)}}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
     {"stopped before", kByIndex, Nothing, {{0, Signal(SIGTERM)}}, ""},
     {"highest rate", kByIndex, Params({{"playrate", INT_MAX}}), {}, "0:P0 99:P99 "},
@@ -210,6 +216,21 @@ const FramesRow kFrames[] = {
      "P0 P0 P2 P4 P6 "},
     {"no rate to follow", kByTime, ClientSets(4), {}, "P0 P0 P1 P2 P3 "},
     {"paused and resumed", kByTime, Nothing, {{2, Signal(SIGUSR2)}, {4, Signal(SIGUSR2)}}, "P0 P0 P0 P0 P1 "},
+    {"paused at the first", kByTime, Nothing, {{1, Signal(SIGUSR2)}}, "P0 P0 P0 P0 P0 "},
+    {"paused before the first", kByTime, Nothing, {{0, Signal(SIGUSR2)}, {3, Signal(SIGUSR2)}}, "P0 P0 P0 P1 P2 "},
+    {"paused at rate 4", kByTime, Params({{"playrate", 4}}), {{2, Signal(SIGUSR2)}}, "P0 P3 P6 P9 P12 "},
+    {"paused while sampling", kByTime, Params({{"interval", 0}}), {{3, Signal(SIGUSR2)}}, "0:P0 1:P0 2:P1 2:P1 2:P1 "},
+    {"rate followed while sampling",
+     kByTime,
+     Params({{"interval", 0}, {"changerate", 1}}),
+     {{1, ClientSets(4)}},
+     "0:P0 1:P0 2:P1 3:P2 4:P3 "},
+    {"refused while sampling",
+     kByTime,
+     Params({{"interval", 0}}) + [](auto& p) { p.progress_result = 1; },
+     {},
+     "0:P0 "},
+    {"stop kept in 32 bits", kByTime, Params({{"stopTimeMS", (Json::Int64{1} << 32) + 39}}), {}, "P0 P0 P1 P2 "},
     {"paused in the midst", kByTime, Params({{"startTimeMS", 70}}), {{3, Signal(SIGUSR2)}}, "P7 P7 P8 P8 P8 "},
     {"interval 2",
      kByTime,
@@ -289,6 +310,19 @@ TEST(Playback, PublishesTheTimeOfTheLabelOrTheRate) {
     player.Run({}, 4);
     EXPECT_EQ(player.All("Set("), "0 10 20 30 ");
     EXPECT_EQ(player.All("Get("), "");
+    for (const char* method : {kByIndex, kByTime}) {
+        Player unmoved(method);
+        Params({{"playrate", 0}, {"changerate", 1}})(unmoved.platform);
+        unmoved.Run({}, 1);
+        EXPECT_EQ(unmoved.All("Set("), "1 ") << method;
+    }
+    Player refused(kByTime);
+    refused.platform.progress_result = 1;
+    Params({{"mountid", 4}, {"timestamp", Json::Int64{1} << 32}, {"flushHeader", 1}})(refused.platform);
+    refused.Run({}, 5);
+    EXPECT_EQ(refused.All("ProgressIndicator("), "4294967296 ");
+    EXPECT_THAT(refused.calls, testing::Contains("Event::Load(3,4,0,0)").Times(2));
+    EXPECT_EQ(refused.All("Delay("), "") << "nothing more is sent or read once the position is refused";
 }
 
 struct Outcome {

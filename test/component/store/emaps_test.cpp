@@ -155,9 +155,15 @@ TEST_P(EmapTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
     EXPECT_THROW(pictures_.Put(99, "<svg/>"), NotFound);
     EXPECT_EQ(emaps_.Find(map)->image, first);
     namespace fs = std::filesystem;
-    fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
+    const auto make_old = [&] {
+        fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
+    };
+    make_old();
     pictures_.Put(map, "\xff\xd8\xff\xe0");
     EXPECT_NE(emaps_.Find(map)->image, first);
+    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "whoever has just been told of it";
+    make_old();
+    pictures_.Put(map, "\xff\xd8\xff\xe0");
     EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
 
     std::ofstream(folder_ / "secret.svg") << "<svg/>";
@@ -246,11 +252,16 @@ TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
-    EXPECT_THAT(servers_.Secrets(), ElementsAre(kSecret));
+    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is asked has nothing to ask here";
+    RecordingServer asker{.name = "Asks only"};
+    asker.id = servers_.Add(asker, kSecret);
+    EXPECT_THAT(servers_.AskersSecrets(), ElementsAre(kSecret));
+    asker.enabled = false;
+    servers_.Update(asker);
+    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is switched off gets no answer";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;
     servers_.Update(changed, std::string(64, 'b'));
-    EXPECT_THAT(servers_.Secrets(), IsEmpty()) << "one that is switched off gets no answer";
     EXPECT_EQ(servers_.FindSecret(server), "");
     changed.enabled = true;
     servers_.Update(changed);

@@ -150,6 +150,11 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
     POS pos;
     ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 1) << "the camera's id on the till's server";
+    devices_.Add({.kind = EmapItemType::kPos, .name = "Far till", .server_id = 1, .id_on_server = 6, .camera_id = 1});
+    ASSERT_EQ(pos.LoadByIdOnRecServer(6, 1), 0);
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "a camera that the till's server does not know";
+    ASSERT_EQ(pos.Load(devices_.Add({.kind = EmapItemType::kPos, .name = "Own till", .camera_id = 2})), 0);
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 2) << "whosever the camera is, it has an id here";
 
     EXPECT_EQ(GetCamIdOnHost(1, 1), 2);
     EXPECT_EQ(GetCamIdOnHost(1, 2), 0);
@@ -171,6 +176,12 @@ TEST_F(EmapBinding, EachProfileIsDeniedItsOwn) {
     EXPECT_THAT(guest.GetInaEmapIdSet(ITEM_PRIV_VIEW, false), ElementsAre(1));
     EXPECT_THAT(guest.GetInaIOIdSet(false), ElementsAre(5));
     EXPECT_THAT(PrivProfileGetByUid(1).GetInaEmapIdSet(ITEM_PRIV_VIEW, false), IsEmpty());
+    const PrivProfile nobody = PrivProfileGetByUid(9);
+    EXPECT_THROW(nobody.GetInaEmapIdSet(ITEM_PRIV_VIEW, false), std::runtime_error) << "or nothing would be denied";
+    EXPECT_THROW(nobody.GetInaIOIdSet(false), std::runtime_error);
+    EXPECT_THROW(nobody.GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), std::runtime_error);
+    RequestContext::Current().Renounce({7});
+    EXPECT_THAT(PrivProfileGetByUid(1).GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), ElementsAre(7));
     const struct {
         unsigned int user;
         int door;
@@ -193,8 +204,13 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     const std::string cookie = servers.at(1).GetCookie();
     const std::string timestamp = cookie.substr(0, cookie.find('-'));
     EXPECT_EQ(cookie.find(kSecret), std::string::npos);
-    EXPECT_TRUE(IsAuthPairMatch(cookie.substr(timestamp.size() + 1), timestamp));
-    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
+    const std::string token = cookie.substr(timestamp.size() + 1);
+    EXPECT_EQ(token, store::MakePairToken(kSecret, timestamp));
+    EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "what is shown to another host opens nothing here";
+    for (const unsigned int caller : {2U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
+        Call(caller);
+        EXPECT_EQ(SlaveHxMgr(true).GetSlaveHxMap(true, true, true).at(1).GetCookie(), "") << caller;
+    }
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
     EXPECT_FALSE(
@@ -202,6 +218,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
     EXPECT_TRUE(
         SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
 }
 
 }  // namespace
