@@ -98,7 +98,7 @@ void MjpegStreamHandler::HandlePlayEventNoFrameId() {
     const long long timestamp = m_pRequest->GetParam("timestamp", 0).asInt64();
 
     if (eventId < 1 || startTimeMS < 0 || timestamp < 1) {
-        // No error here: this method's clients go by the redirect alone.
+        // No error here: the redirect is all that is said.
         LH_TRACE(LOG_CATEG_PLAYER, LOG_LEVEL_ERR, kMjpegStreamerSource, "Invalid input\n");
         PrintWarningRedirect();
     } else if (TakeSession(__func__)) {
