@@ -121,6 +121,19 @@ describe("a player", () => {
     await vi.waitFor(() => expect([player.index, player.state.kind]).toEqual([0, "paused"]));
   });
 
+  test("a frame that is being decoded at a pause is told to be unwanted: picture and number stay the same", async () => {
+    let drawn = -1;
+    player.show = async (frame, signal) => {
+      if (frame.index === 3) setTimeout(() => player.pause(), 0);
+      await new Promise((resolve) => setTimeout(resolve, 5));
+      if (!signal.aborted) drawn = frame.index;
+    };
+    player.open(footage(7), 0, true);
+    await until("paused");
+    await new Promise((resolve) => setTimeout(resolve, 20));
+    expect([drawn, player.index]).toEqual([2, 2]);
+  });
+
   test("a mark is found by frame, since the server knows no times in it", async () => {
     player.open(footage(8, { kind: "alert" }), 5_000, false);
     await until("paused");

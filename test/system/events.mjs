@@ -37,8 +37,9 @@ await visit(async (page, complaints) => {
   while (scale > 0.2) {
     await page.mouse.move(box.x + x, y);
     for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
-    const [here, right] = [await timeAt(x), await timeAt(x + 100)];
-    scale = (right - here) / 100;
+    const away = x < box.width / 2 ? 400 : -400;
+    const [here, there] = [await timeAt(x), await timeAt(x + away)];
+    scale = (there - here) / away;
     x += (middle - here) / scale;
   }
   await timeAt(x);
@@ -64,7 +65,7 @@ await visit(async (page, complaints) => {
   await next("ArrowLeft", before.told - 1);
   await report("two back", await shown());
 
-  await timeAt(x + 3 / scale);
+  await timeAt(x + Math.min(3 / scale, box.width - x - 20));
   await settled("playing");
   await page.keyboard.press(" ");
   await settled("paused");

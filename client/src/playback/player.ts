@@ -34,8 +34,8 @@ const kExactUntilMs = 1_000;
 const kCannotPlay = 200;
 
 export class Player {
-  /** Draws a frame; the next is fetched when it is done. */
-  show: (frame: RecordedFrame) => Promise<void> = async () => undefined;
+  /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
+  show: (frame: RecordedFrame, signal: AbortSignal) => Promise<void> = async () => undefined;
   readonly #recordings: Recordings;
   readonly #changed: () => void;
   #footage: Footage | null = null;
@@ -237,7 +237,7 @@ export class Player {
 
   async #showFrame(frame: RecordedFrame, signal: AbortSignal): Promise<void> {
     // A frame that cannot be decoded is left out, and counts as shown.
-    await this.show(frame).catch(() => undefined);
+    await this.show(frame, signal).catch(() => undefined);
     if (signal.aborted) return;
     this.#lastFrameMs = performance.now();
     this.#index = frame.index;

@@ -18,11 +18,14 @@ export class PlayerTile {
   /** `onAgain` is the user's wish to play what has stopped. */
   constructor(name: string, player: Player, onAgain: () => void) {
     this.#player = player;
-    player.show = async ({ jpeg }) => {
+    player.show = async ({ jpeg }, signal) => {
       const image = await createImageBitmap(jpeg);
-      draw(this.#canvas, image);
+      // A pause while it was decoded holds the frame before, which is the one that the player tells.
+      if (!signal.aborted) {
+        draw(this.#canvas, image);
+        this.root.classList.add("has-picture");
+      }
       image.close();
-      this.root.classList.add("has-picture");
     };
     this.#again.addEventListener("click", onAgain);
     const message = element(
