@@ -164,13 +164,16 @@ TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
 
 // A small disk of this process and its children alone, which vanishes with them.
 bool MountSmallDisk(const fs::path& folder, const char* size) {
-    const std::string uid = std::to_string(::getuid());
+    const uid_t user = ::geteuid();
+    const gid_t group = ::getegid();
     if (::unshare(CLONE_NEWNS) != 0) {
         // A user without rights has them in a namespace; root has them here or nowhere, and needs other users too.
-        if (::geteuid() == 0 || ::unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0) {
+        if (user == 0 || ::unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0) {
             return false;
         }
-        std::ofstream("/proc/self/uid_map") << uid << ' ' << uid << " 1";
+        std::ofstream("/proc/self/setgroups") << "deny";
+        std::ofstream("/proc/self/uid_map") << user << ' ' << user << " 1";
+        std::ofstream("/proc/self/gid_map") << group << ' ' << group << " 1";
     }
     return ::mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
            ::mount("tmpfs", folder.c_str(), "tmpfs", 0, (std::string("size=") + size).c_str()) == 0;
