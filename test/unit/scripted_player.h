@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A player of recorded events against the scripted platform: what it calls, what it sends, and what happens meanwhile.
+#pragma once
+
+#include <csignal>
+#include <cstdio>
+#include <fstream>
+#include <functional>
+#include <map>
+#include <sstream>
+#include <string>
+
+#include <unistd.h>
+
+#include "player/mjpegstreamer/mjpegstreamer.h"
+#include "player/mjpegstreamer/player_session.h"
+#include "test/support/platform/scripted_platform.h"
+
+namespace lookhaven::test {
+
+using Script = std::function<void(ScriptedPlatform&)>;
+
+inline const char* const kByIndex = "PlayMjpegEvent";
+inline const char* const kByTime = "PlayMjpegEventNoFrameId";
+inline const std::string kSession = "unit" + std::to_string(getpid());
+inline const std::string kPidFile = "/tmp/player_src.pid." + kSession;
+inline constexpr char kRedirect[] =
+    "Location: /webman/3rdparty/Lookhaven/resources/images/2x/components/icon_indicator_warning.png\r\n\r\n";
+
+inline void WritePidFile(const std::string& text) {
+    std::ofstream(kPidFile) << text;
+}
+
+// The file's text, "none" without one.
+inline std::string PidFile() {
+    std::ifstream file(kPidFile);
+    std::ostringstream text;
+    text << file.rdbuf();
+    return file ? text.str() : "none";
+}
+
+// A request to play event 3, of 100 frames at 10 fps, as stream 5.
+struct Player {
+    explicit Player(const char* method) {
+        g_PlayerStop = g_PlayerCheckPid = g_PlayerPause = 0;
+        platform.method = method;
+        platform.session_id = kSession;
+        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = LOG_LEVEL_ERR;
+        platform.events[3] = MakeEvent(3, 100, 110);
+        platform.params = {{"eventid", 3}, {"timestamp", 5}};
+    }
+    ~Player() { std::remove(kPidFile.c_str()); }
+
+    // What standard output got. At a picture's number, counted from 1, happens what is planned for it; 0: before the
+    // first. SIGTERM comes at the last one.
+    std::string Run(const std::map<int, Script>& plan, int last_picture) {
+        int pictures = 0;
+        platform.on_call = [&](const std::string& call) {
+            const bool is_picture = call.rfind("Write(image/jpeg", 0) == 0;
+            pictures += is_picture;
+            const auto planned = plan.find(pictures);
+            if ((is_picture || call == "BeginTiming()") && planned != plan.end()) {
+                planned->second(platform);
+            }
+            if (is_picture && pictures == last_picture) {
+                std::raise(SIGTERM);
+            }
+        };
+        StdoutCapture capture;
+        platform.calls.clear();
+        MjpegStreamHandler(platform.Request(), platform.Response()).HandleProcess();
+        calls = platform.calls;  // before the capture's own flush
+        return capture.Text();
+    }
+
+    // What stands between the text and the next comma or bracket in each call that begins with it, joined.
+    std::string All(const std::string& text) const {
+        std::string all;
+        for (const auto& call : calls) {
+            if (call.rfind(text, 0) == 0) {
+                all += call.substr(text.size(), call.find_first_of(",)", text.size()) - text.size()) + " ";
+            }
+        }
+        return all;
+    }
+
+    // What was sent: 4:P4 for a picture behind its index, P4 for one without.
+    std::string Frames() const {
+        std::string frames;
+        for (const auto& call : calls) {
+            if (call.rfind("Write(text/plain,", 0) == 0) {
+                frames += call.substr(17, call.find("\r\n,") - 17) + ":";
+            } else if (call.rfind("Write(image/jpeg,", 0) == 0) {
+                frames += call.substr(17, call.find(',', 17) - 17) + " ";
+            }
+        }
+        return frames;
+    }
+
+    ScriptedPlatform platform;
+    Calls calls;
+};
+
+inline Script Params(const std::map<std::string, Json::Value>& params) {
+    return [params](ScriptedPlatform& p) {
+        for (const auto& [name, value] : params) {
+            p.params[name] = value;
+        }
+    };
+}
+inline Script Frames(int count) {
+    return [count](ScriptedPlatform& p) { p.frame_count = count; };
+}
+inline Script ClientSets(int number) {
+    return [number](ScriptedPlatform& p) { p.client_number = number; };
+}
+inline Script Signal(int signal) {
+    return [signal](ScriptedPlatform&) { std::raise(signal); };
+}
+inline Script operator+(const Script& first, const Script& second) {
+    return [=](ScriptedPlatform& p) { first(p), second(p); };
+}
+inline void Nothing(ScriptedPlatform&) {}
+
+inline const Calls kSignals = {"sigaction(15,0,no mask)", "sigaction(10,0,no mask)", "sigaction(12,0,no mask)"};
+inline const Calls kOpen = {"Event::Load(3,0,0,0)", "IsFileExist(/rec/3)", "ProgressIndicator(5,1,1)",
+                            "DelayTimer(0)",        "Init(/rec/3)",        "GetFrameInfo()"};
+inline const Calls kPace = {"SetDelayTime(100000)", "BeginTiming()"};
+inline const Calls kPicture = {"Write(image/jpeg,P0,2,null)", "fflush()"};
+
+}  // namespace lookhaven::test
