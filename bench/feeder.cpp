@@ -14,7 +14,7 @@
 
 #include "bench/frame_stamp.h"
 #include "standalone/base/clock.h"
-#include "standalone/ring/common_config.h"
+#include "standalone/control/common_config.h"
 #include "standalone/ring/writer.h"
 
 namespace {
@@ -25,7 +25,7 @@ volatile std::sig_atomic_t g_stop = 0;
 
 int Run(int camera, const std::string& codec, std::size_t frame_bytes, int frames_per_second) {
     const auto installation = base::Installation::FromEnvironment();
-    ring::CommonConfigKeeper common(installation);
+    control::CommonConfigKeeper common(installation);
     ring::StreamFormat format;
     format.codec = codec;
     format.every_frame_is_key = codec == "MJPEG";

@@ -7,25 +7,25 @@
 #include "standalone/base/clock.h"
 #include "standalone/binding/request.h"
 #include "standalone/binding/request_context.h"
-#include "standalone/ring/common_config.h"
+#include "standalone/control/common_config.h"
 #include "standalone/store/users.h"
 
-namespace ring = lookhaven::ring;
+namespace control = lookhaven::control;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
 
-static_assert(sizeof(LHShmCommonCfg) == sizeof(ring::CommonConfig));
-static_assert(offsetof(LHShmCommonCfg, m_Timestamp) == offsetof(ring::CommonConfig, timestamp_sec));
-static_assert(offsetof(LHShmCommonCfg, m_blPause) == offsetof(ring::CommonConfig, paused));
+static_assert(sizeof(LHShmCommonCfg) == sizeof(control::CommonConfig));
+static_assert(offsetof(LHShmCommonCfg, m_Timestamp) == offsetof(control::CommonConfig, timestamp_sec));
+static_assert(offsetof(LHShmCommonCfg, m_blPause) == offsetof(control::CommonConfig, paused));
 
 namespace {
 
 // Mapped once; asked again only while there is none, since the record may come later.
-ring::CommonConfig* CommonRecord() {
-    static ring::CommonConfig* record = nullptr;
+control::CommonConfig* CommonRecord() {
+    static control::CommonConfig* record = nullptr;
     if (record == nullptr) {
-        record = OrFailure<ring::CommonConfig*>("common configuration", nullptr,
-                                                [] { return ring::MapCommonConfig(RequestContext::Current().Home()); });
+        record = OrFailure<control::CommonConfig*>(
+            "common configuration", nullptr, [] { return control::MapCommonConfig(RequestContext::Current().Home()); });
     }
     return record;
 }
@@ -41,8 +41,8 @@ long GetMonoTimeSec() {
 }
 
 bool IsLHRunning() {
-    ring::CommonConfig* record = CommonRecord();
-    return record != nullptr && ring::IsRecorderAlive(*record);
+    control::CommonConfig* record = CommonRecord();
+    return record != nullptr && control::IsRecorderAlive(*record);
 }
 
 // The default task set is every processor, where a process runs anyway; there are no others.

@@ -10,7 +10,7 @@
 #include "standalone/binding/event_record.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/ring/flush_request.h"
+#include "standalone/control/flush_request.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
@@ -208,7 +208,7 @@ int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type) {
         RequestContext& context = RequestContext::Current();
         context.CloseRecords();
         const bool flushed =
-            type == REC_EVENT_RECORDED && lookhaven::ring::FlushRequests(context.Home()).Ask(event.GetId());
+            type == REC_EVENT_RECORDED && lookhaven::control::FlushRequests(context.Home()).Ask(event.GetId());
         return flushed ? 0 : -1;
     });
 }

@@ -15,10 +15,11 @@
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/ring/demand.h"
+#include "standalone/control/demand.h"
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
 
+namespace control = lookhaven::control;
 namespace ring = lookhaven::ring;
 namespace store = lookhaven::store;
 using lookhaven::base::MonotonicMicros;
@@ -74,7 +75,7 @@ bool HasStream(store::Store& records, int camera_id, int stream) {
 
 // Waits for a ring with a frame of this start; null when none comes in time, the recorder dies or a signal arrives.
 void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
-    ring::Demand demand(context.Home());
+    control::Demand demand(context.Home());
     void* stream = nullptr;
     for (const std::int64_t start = MonotonicMicros();;) {
         if (stream == nullptr) {
@@ -120,7 +121,7 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
 ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
     const RequestContext& context = RequestContext::Current();
     void* stream = OrFailure<void*>("LiveAdoStreamFifoAt", nullptr, [&]() -> void* {
-        if (context.GrantedStream() != ring::LiveStream{camId, streamNo}) {
+        if (context.GrantedStream() != control::LiveStream{camId, streamNo}) {
             return nullptr;
         }
         const ring::StreamId id{camId, streamNo, ring::Medium::kAudio};
@@ -195,9 +196,9 @@ void LiveStreamUpdater::StartLive() {
 void LiveStreamUpdater::UpdateStamp() {
     OrFailure("LiveStreamUpdater", 0, [&] {
         const RequestContext& context = RequestContext::Current();
-        const ring::LiveStream stream{m_CamId, m_StreamNo};
+        const control::LiveStream stream{m_CamId, m_StreamNo};
         if (context.GrantedStream() == stream) {
-            static ring::Demand demand(context.Home());
+            static control::Demand demand(context.Home());
             demand.Touch(stream);
         }
         return 0;

@@ -7,13 +7,13 @@
 #include <time.h>
 
 #include "standalone/base/clock.h"
-#include "standalone/base/progress_file.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/control/progress_file.h"
 
 using lookhaven::base::MonotonicMicros;
-using lookhaven::base::ProgressFile;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
+using lookhaven::control::ProgressFile;
 
 namespace {
 

@@ -7,18 +7,18 @@
 #include <malloc.h>
 
 #include "platform/log/dbglogcfg.h"
-#include "standalone/base/debug_log_config.h"
 #include "standalone/base/log.h"
+#include "standalone/control/debug_log_config.h"
 
 DbgLogCfg* g_pDbgLogCfg = nullptr;
 int g_DbgLogPid = 0;
 
 namespace lookhaven::binding {
 
-static_assert(sizeof(DbgLogCfg) == sizeof(base::DebugLogConfig));
-static_assert(offsetof(DbgLogCfg, m_CategLevel) == offsetof(base::DebugLogConfig, category_level));
-static_assert(offsetof(DbgLogCfg, m_PidCount) == offsetof(base::DebugLogConfig, process_count));
-static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(base::DebugLogConfig, process));
+static_assert(sizeof(DbgLogCfg) == sizeof(control::DebugLogConfig));
+static_assert(offsetof(DbgLogCfg, m_CategLevel) == offsetof(control::DebugLogConfig, category_level));
+static_assert(offsetof(DbgLogCfg, m_PidCount) == offsetof(control::DebugLogConfig, process_count));
+static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(control::DebugLogConfig, process));
 
 RequestContext& RequestContext::Current() {
     // Never destroyed: a request process leaves by _exit, and what is here goes with it.
@@ -33,7 +33,7 @@ void RequestContext::Begin(const base::Installation& installation, Output* outpu
     events_ = std::move(events);
     g_DbgLogPid = 0;
     // The module only reads it, through a declaration that knows no const.
-    const void* config = base::MapDebugLog(installation);
+    const void* config = control::MapDebugLog(installation);
     g_pDbgLogCfg = static_cast<DbgLogCfg*>(const_cast<void*>(config));
 }
 

@@ -17,7 +17,7 @@
 #include "platform/export.h"
 #include "standalone/base/installation.h"
 #include "standalone/binding/output.h"
-#include "standalone/ring/demand.h"
+#include "standalone/control/demand.h"
 #include "standalone/ring/stream.h"
 #include "standalone/store/store.h"
 
@@ -67,9 +67,9 @@ class LH_PLATFORM_API RequestContext {
     }
 
     // The live stream that the caller was found to be allowed, and whether its sound is too.
-    const std::optional<ring::LiveStream>& GrantedStream() const { return granted_; }
+    const std::optional<control::LiveStream>& GrantedStream() const { return granted_; }
     bool MayHear() const { return may_hear_; }
-    void GrantStream(ring::LiveStream stream, bool may_hear) {
+    void GrantStream(control::LiveStream stream, bool may_hear) {
         granted_ = stream;
         may_hear_ = may_hear;
     }
@@ -94,7 +94,7 @@ class LH_PLATFORM_API RequestContext {
     std::string session_;
     std::set<int> renounced_cameras_;
     std::set<int> renounced_sound_;
-    std::optional<ring::LiveStream> granted_;
+    std::optional<control::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;
     bool wants_picture_ = false;

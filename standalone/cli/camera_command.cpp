@@ -11,6 +11,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_options.h"
 #include "standalone/media/probe.h"
+#include "standalone/pattern/pattern_source.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/text.h"
 
@@ -74,7 +75,7 @@ media::ProbeResult Probe(const std::string& source, const std::optional<store::C
     if (credentials) {
         login = {credentials->account, credentials->password};
     }
-    return media::ProbeSource(source, login, kProbeLimit);
+    return media::ProbeSource(pattern::AllSourceKinds(), source, login, kProbeLimit);
 }
 
 VideoType TypeOf(media::Codec codec) {

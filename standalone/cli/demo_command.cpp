@@ -7,9 +7,10 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/demo_emaps.h"
-#include "standalone/cli/demo_events.h"
-#include "standalone/cli/demo_footage.h"
+#include "standalone/demo/demo_emaps.h"
+#include "standalone/demo/demo_events.h"
+#include "standalone/demo/demo_footage.h"
+#include "standalone/demo/not_ready.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
@@ -113,7 +114,7 @@ void Setup(const Console& console) {
     if (viewer_missing) {
         users.Deny(users.Add(kViewer, password, store::Privilege::kViewer).id, denied);
     }
-    const int maps = AddDemoEmaps(store, console.Installation().Home(), ids, users.FindByName(kViewer)->id);
+    const int maps = demo::AddDemoEmaps(store, console.Installation().Home(), ids, users.FindByName(kViewer)->id);
     Json::Value data;
     data["cameras_added"] = added;
     data["viewer_added"] = viewer_missing;
@@ -123,9 +124,21 @@ void Setup(const Console& console) {
                    data);
 }
 
+// Runs make; what the demo cannot do ends the command.
+template <typename Make>
+auto OrFail(Make make) {
+    try {
+        return make();
+    } catch (const demo::NotReady& error) {
+        throw Failure(kDataError, error.what());
+    } catch (const std::invalid_argument& error) {
+        throw Failure(kUsage, error.what());
+    }
+}
+
 void MakeFootage(const Console& console) {
     store::Store store = console.OpenStore();
-    const DemoFootage made = RecordDemoFootage(store, base::WallMillis() / 1000);
+    const demo::DemoFootage made = OrFail([&] { return demo::RecordDemoFootage(store, base::WallMillis() / 1000); });
     Json::Value data;
     data["events_added"] = made.events;
     data["marks_added"] = made.marks;
@@ -149,7 +162,8 @@ void MakeEvents(const Console& console, const EventRequest& request) {
         console.Answer("What was made up is gone: " + std::to_string(removed) + " events, alerts and sales.", data);
         return;
     }
-    const DemoAmount made = AddDemoEvents(store, request.count, request.days, base::WallMillis() / 1000);
+    const demo::DemoAmount made =
+        OrFail([&] { return demo::AddDemoEvents(store, request.count, request.days, base::WallMillis() / 1000); });
     data["events_added"] = made.events;
     data["marks_added"] = made.marks;
     console.Answer("Made up " + std::to_string(made.events) + " events and " + std::to_string(made.marks) +

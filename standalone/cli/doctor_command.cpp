@@ -17,13 +17,13 @@
 #include "standalone/base/file_descriptor.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/units.h"
-#include "standalone/ring/common_config.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/recording_state.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
-#include "standalone/upkeep/mount_folder.h"
-#include "standalone/upkeep/recording_state.h"
 
 namespace lookhaven::cli {
 
@@ -87,7 +87,7 @@ Findings CheckMount(store::Store& store, const store::Mount& mount) {
         return {
             {name + " is not there", "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path"}};
     }
-    const auto folder = upkeep::MountFolder::Open(mount.path, mount.id);
+    const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
     if (!folder) {
         return {{name + " is not the folder that was added",
                  "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path " + mount.path}};
@@ -96,7 +96,7 @@ Findings CheckMount(store::Store& store, const store::Mount& mount) {
     if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
         findings.push_back({name + " cannot be written by you", "run this as the user who runs the server"});
     }
-    const upkeep::MountSpace space = folder->Space();
+    const maintenance::MountSpace space = folder->Space();
     if (space.free_bytes < space.ReserveBytes()) {
         findings.push_back({name + " has only " + FormatSize(space.free_bytes) + " left, recording needs " +
                                 FormatSize(space.ReserveBytes()),
@@ -166,8 +166,8 @@ Findings CheckHost(const base::Installation& installation) {
 }
 
 Findings CheckRecorder(const base::Installation& installation) {
-    ring::CommonConfig* config = ring::MapCommonConfig(installation);
-    if (config != nullptr && ring::IsRecorderAlive(*config)) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    if (config != nullptr && control::IsRecorderAlive(*config)) {
         return {};
     }
     return {{config == nullptr ? "the recorder has not run since the machine started" : "the recorder does not run",
@@ -176,15 +176,16 @@ Findings CheckRecorder(const base::Installation& installation) {
 
 // What the recorder itself says is in its way.
 Findings CheckRecordings(const base::Installation& installation) {
-    ring::CommonConfig* config = ring::MapCommonConfig(installation);
-    if (config == nullptr || !ring::IsRecorderAlive(*config)) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    if (config == nullptr || !control::IsRecorderAlive(*config)) {
         return {};
     }
     Findings findings;
-    for (const upkeep::CameraRecordingState& state : upkeep::ReadRecordingStates(installation)) {
-        if (state.state != upkeep::RecordingState::kReady && state.state != upkeep::RecordingState::kRecording) {
+    for (const maintenance::CameraRecordingState& state : maintenance::ReadRecordingStates(installation)) {
+        if (state.state != maintenance::RecordingState::kReady &&
+            state.state != maintenance::RecordingState::kRecording) {
             findings.push_back(
-                {"camera " + std::to_string(state.camera) + " is not recorded: " + upkeep::NameOf(state.state),
+                {"camera " + std::to_string(state.camera) + " is not recorded: " + maintenance::NameOf(state.state),
                  "see to its mount: lookhaven mount list; recording then goes on by itself"});
         }
     }

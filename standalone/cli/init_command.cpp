@@ -6,11 +6,11 @@
 #include <memory>
 #include <system_error>
 
-#include "standalone/base/debug_log_config.h"
 #include "standalone/cli/commands.h"
+#include "standalone/control/debug_log_config.h"
+#include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
-#include "standalone/upkeep/mount_folder.h"
 
 namespace lookhaven::cli {
 
@@ -20,7 +20,7 @@ base::Installation MakeFolders(const std::string& home) {
     try {
         base::Installation::CreateFolders(home);
         base::Installation installation(home);
-        base::DebugLogEditor debug_log(installation);
+        control::DebugLogEditor debug_log(installation);
         return installation;
     } catch (const std::system_error& error) {
         throw Failure(kCannotCreate, "cannot set up the state folder " + home + ": " + error.code().message() +
@@ -52,7 +52,7 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.name = "default";
     mount.path = folder.lexically_normal().string();
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
-    upkeep::MountFolder::Mark(folder, mounts.Add(mount));
+    maintenance::MountFolder::Mark(folder, mounts.Add(mount));
     return true;
 }
 

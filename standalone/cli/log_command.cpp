@@ -6,9 +6,9 @@
 #include <memory>
 #include <optional>
 
-#include "standalone/base/debug_log_config.h"
 #include "standalone/base/process.h"
 #include "standalone/cli/commands.h"
+#include "standalone/control/debug_log_config.h"
 
 namespace lookhaven::cli {
 
@@ -31,7 +31,7 @@ std::string NameOf(const std::map<std::string, int>& names, int number) {
 }
 
 void Show(const Console& console) {
-    const base::DebugLogConfig* config = base::MapDebugLog(console.Installation());
+    const control::DebugLogConfig* config = control::MapDebugLog(console.Installation());
     if (config == nullptr) {
         throw Failure(kNoInput, "there is no log configuration yet: run lookhaven init");
     }
@@ -46,7 +46,7 @@ void Show(const Console& console) {
     data["other_categories"] = common;
     data["categories"] = data["processes"] = Json::arrayValue;
     Rows rows = {{"what", "level"}};
-    for (int category = 0; category < base::kDebugLogCategoryCount; ++category) {
+    for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
         const int level = config->category_level[category];
         const std::string name = NameOf(kCategories, category);
         if (level != common || kCategories.contains(name)) {
@@ -59,7 +59,7 @@ void Show(const Console& console) {
         }
     }
     rows.push_back({"other categories", NameOf(kLevels, common)});
-    for (int i = 0; i < std::min(config->process_count, base::kDebugLogProcessCount); ++i) {
+    for (int i = 0; i < std::min(config->process_count, control::kDebugLogProcessCount); ++i) {
         Json::Value entry;
         entry["pid"] = config->process[i].pid;
         entry["level"] = config->process[i].level;
@@ -71,7 +71,7 @@ void Show(const Console& console) {
 }
 
 void Set(const Console& console, const Change& change) {
-    base::DebugLogEditor editor(console.Installation());
+    control::DebugLogEditor editor(console.Installation());
     for (const pid_t pid : change.processes) {
         if (change.level != 0 && base::ProcessStartTicks(pid) == 0) {
             throw Failure(kDataError, "there is no process " + std::to_string(pid));
@@ -105,7 +105,7 @@ void AddLog(CLI::App& program, Console& console) {
         ->allow_extra_args(false)
         ->transform(CLI::Transformer(kCategories).description(""))
         ->type_name("liveview|player|NUMBER")
-        ->check(CLI::Range(0, base::kDebugLogCategoryCount - 1));
+        ->check(CLI::Range(0, control::kDebugLogCategoryCount - 1));
     set->add_option("--process", change->processes, "A process id; may be repeated")
         ->allow_extra_args(false)
         ->check(CLI::PositiveNumber);

@@ -9,9 +9,9 @@
 
 #include "standalone/cli/commands.h"
 #include "standalone/cli/units.h"
+#include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
-#include "standalone/upkeep/mount_folder.h"
 
 namespace lookhaven::cli {
 
@@ -79,7 +79,7 @@ void Add(const Console& console, const Request& request) {
         mount.name = std::filesystem::path(mount.path).filename();
     }
     mount.id = Mounts(store).Add(mount);
-    upkeep::MountFolder::Mark(mount.path, mount.id);
+    maintenance::MountFolder::Mark(mount.path, mount.id);
     console.Answer("The mount " + mount.name + " has the id " + std::to_string(mount.id) + ".",
                    ToData(*Mounts(store).Find(mount.id)));
 }
@@ -93,7 +93,7 @@ void Change(const Console& console, const Request& request) {
     Apply(*mount, request);
     Mounts(store).Update(*mount);
     if (!request.path.empty()) {
-        upkeep::MountFolder::Mark(mount->path, mount->id);
+        maintenance::MountFolder::Mark(mount->path, mount->id);
     }
     console.Answer("The mount " + mount->name + " is changed.", ToData(*mount));
 }
@@ -109,7 +109,7 @@ void List(const Console& console) {
     Rows rows = {{"id", "name", "events", "size", "limit", "max age", "free", "path", ""}};
     for (const Mount& mount : Mounts(store).List()) {
         const store::MountContent content = events.Content(mount.id);
-        const auto folder = upkeep::MountFolder::Open(mount.path, mount.id);
+        const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
         Json::Value entry = ToData(mount);
         entry["events"] = Json::Int64(content.events);
         entry["size_bytes"] = Json::Int64(content.size_bytes);

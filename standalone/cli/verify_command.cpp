@@ -7,7 +7,7 @@
 #include <unistd.h>
 
 #include "standalone/cli/commands.h"
-#include "standalone/upkeep/verify.h"
+#include "standalone/maintenance/verify.h"
 
 namespace lookhaven::cli {
 
@@ -20,15 +20,15 @@ void ShowProgress(std::size_t done, std::size_t all) {
 void Verify(const Console& console, bool repair) {
     store::Store store = console.OpenStore();
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;
-    const upkeep::VerifyReport report =
-        upkeep::Verify(store, repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>());
+    const maintenance::VerifyReport report =
+        maintenance::Verify(store, repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>());
     Json::Value data;
     data["events"] = Json::Int64(report.events);
     data["frames"] = Json::Int64(report.frames);
     data["faults"] = Json::arrayValue;
     std::string text;
     std::size_t left = 0;
-    for (const upkeep::Fault& fault : report.faults) {
+    for (const maintenance::Fault& fault : report.faults) {
         Json::Value entry;
         entry["problem"] = fault.problem;
         entry["done"] = fault.done;

@@ -68,7 +68,9 @@ class FileLoop : public Source {
 
 }  // namespace
 
-std::unique_ptr<Source> OpenFileLoop(const std::string& path, const SourceOptions& options, std::stop_token stop) {
+std::unique_ptr<Source> OpenFileLoop(const std::string& url, const SourceOptions& options, std::stop_token stop) {
+    const std::string rest = url.substr(std::string_view("file:").size());
+    std::string path = rest.starts_with("///") ? rest.substr(2) : rest;
     return std::make_unique<FileLoop>(path, options, std::move(stop));
 }
 

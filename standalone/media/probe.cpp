@@ -10,8 +10,9 @@ constexpr std::int64_t kWatchUs = 1'500'000;
 
 }  // namespace
 
-ProbeResult ProbeSource(const std::string& url, const Credentials& credentials, std::chrono::milliseconds limit) {
-    const std::unique_ptr<Source> source = OpenSource(url, {credentials, limit}, {});
+ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const Credentials& credentials,
+                        std::chrono::milliseconds limit) {
+    const std::unique_ptr<Source> source = OpenSource(kinds, url, {credentials, limit}, {});
     ProbeResult result;
     result.audio = source->Audio();
     std::int64_t first_us = 0;

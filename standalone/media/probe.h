@@ -18,6 +18,7 @@ struct ProbeResult {
 };
 
 // Opens the source and watches a few frames. Throws SourceError when no picture comes within the limit.
-ProbeResult ProbeSource(const std::string& url, const Credentials& credentials, std::chrono::milliseconds limit);
+ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const Credentials& credentials,
+                        std::chrono::milliseconds limit);
 
 }  // namespace lookhaven::media

@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/media/source.h"
 
-#include <algorithm>
-
 #include "standalone/base/blocked_signals.h"
 #include "standalone/media/libav.h"
 #include "standalone/media/source_kinds.h"
@@ -10,32 +8,23 @@
 
 namespace lookhaven::media {
 
-namespace {
-
-std::unique_ptr<Source> Open(const std::string& url, const SourceOptions& options, std::stop_token stop) {
-    const std::string scheme = UrlScheme(url);
-    const std::string rest = url.substr(std::min(scheme.size() + 1, url.size()));
-    if (scheme == "rtsp") {
-        return OpenRtsp(url, options, std::move(stop));
-    }
-    if (scheme == "http" || scheme == "https") {
-        return OpenMjpegHttp(url, options, std::move(stop));
-    }
-    if (scheme == "file") {
-        return OpenFileLoop(rest.starts_with("///") ? rest.substr(2) : rest, options, std::move(stop));
-    }
-    if (scheme == "test") {
-        return OpenPattern(rest, std::move(stop));
-    }
-    throw SourceError("is no source that is known (rtsp, http, https, file, test)");
+SourceKinds CameraKinds() {
+    return {{"rtsp", OpenRtsp}, {"http", OpenMjpegHttp}, {"https", OpenMjpegHttp}, {"file", OpenFileLoop}};
 }
 
-}  // namespace
-
-std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop) {
+std::unique_ptr<Source> OpenSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options,
+                                   std::stop_token stop) {
+    const auto kind = kinds.find(UrlScheme(url));
+    if (kind == kinds.end()) {
+        std::string known;
+        for (const auto& [scheme, opener] : kinds) {
+            known += (known.empty() ? "" : ", ") + scheme;
+        }
+        throw SourceError("is no source that is known (" + known + ")");
+    }
     PrepareAv();
     const base::BlockedSignals blocked;  // for the threads that libav may start
-    return Open(url, options, std::move(stop));
+    return kind->second(url, options, std::move(stop));
 }
 
 }  // namespace lookhaven::media

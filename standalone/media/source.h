@@ -1,18 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Streams of frames from cameras, files and test patterns, opened by URL.
+// Streams of frames from cameras and files, opened by URL.
 //
 //   rtsp://host/path        RTSP with its media inside the TCP connection
 //   http://… https://…      Motion JPEG as a multipart answer
 //   file:/path              a recording, played over and over at its own pace
-//   test:mjpeg?size=1280x720&fps=25&quality=80&label=Entrance
-//   test:h264?size=1280x720&fps=25&gop=25&audio=aac&label=Parking
-//                           a generated scene with a running clock and frame number
 //
 // Thread safety: one thread per source; any number of sources.
 #pragma once
 
 #include <chrono>
+#include <map>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -58,8 +56,19 @@ class Source {
     virtual Packet Next() = 0;
 };
 
+// Opens one kind of source by its whole URL, under the conditions of OpenSource.
+using SourceOpener = std::unique_ptr<Source> (*)(const std::string& url, const SourceOptions& options,
+                                                 std::stop_token stop);
+
+// The kinds of source that a program knows, by the scheme of their URLs.
+using SourceKinds = std::map<std::string, SourceOpener>;
+
+// rtsp, http, https and file. A program may add its own.
+SourceKinds CameraKinds();
+
 // Connects and reads as much as is needed to know the codecs. A stop request ends this and any later wait within about
 // 0.1 s; only the look-up of a host name cannot be cut short. Throws SourceError.
-std::unique_ptr<Source> OpenSource(const std::string& url, const SourceOptions& options, std::stop_token stop);
+std::unique_ptr<Source> OpenSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options,
+                                   std::stop_token stop);
 
 }  // namespace lookhaven::media

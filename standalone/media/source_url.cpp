@@ -2,7 +2,6 @@
 #include "standalone/media/source_url.h"
 
 #include <cctype>
-#include <charconv>
 
 namespace lookhaven::media {
 
@@ -22,21 +21,6 @@ std::string PercentEncode(std::string_view text) {
         }
     }
     return encoded;
-}
-
-std::string PercentDecode(std::string_view text) {
-    std::string decoded;
-    for (std::size_t i = 0; i < text.size(); ++i) {
-        unsigned int byte = 0;
-        if (text[i] == '%' && i + 2 < text.size() &&
-            std::from_chars(&text[i + 1], &text[i + 1] + 2, byte, 16).ptr == &text[i + 1] + 2) {
-            decoded += static_cast<char>(byte);
-            i += 2;
-        } else {
-            decoded += text[i] == '+' ? ' ' : text[i];
-        }
-    }
-    return decoded;
 }
 
 }  // namespace
@@ -80,20 +64,6 @@ std::string RedactSecrets(std::string_view text) {
         redacted += url.substr(host, query - host);
         redacted += query < url.size() ? "?…" : "";
     }
-}
-
-PatternUrl ParsePatternUrl(std::string_view text) {
-    PatternUrl url;
-    url.name = text.substr(0, text.find('?'));
-    text.remove_prefix(std::min(url.name.size() + 1, text.size()));
-    while (!text.empty()) {
-        const std::string_view pair = text.substr(0, text.find('&'));
-        text.remove_prefix(std::min(pair.size() + 1, text.size()));
-        const std::size_t equals = std::min(pair.find('='), pair.size());
-        url.parameters[std::string(pair.substr(0, equals))] =
-            PercentDecode(pair.substr(std::min(equals + 1, pair.size())));
-    }
-    return url;
 }
 
 }  // namespace lookhaven::media

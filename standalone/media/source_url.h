@@ -3,7 +3,6 @@
 // Source URLs: their parts, credentials put in for libav and taken out for people.
 #pragma once
 
-#include <map>
 #include <string>
 #include <string_view>
 
@@ -20,12 +19,5 @@ std::string WithCredentials(const std::string& url, const Credentials& credentia
 
 // The text with the user information and the query of every URL in it replaced by "…".
 std::string RedactSecrets(std::string_view text);
-
-// "mjpeg?size=640x360&label=Front%20door" as its name and its parameters, decoded.
-struct PatternUrl {
-    std::string name;
-    std::map<std::string, std::string> parameters;
-};
-PatternUrl ParsePatternUrl(std::string_view text);
 
 }  // namespace lookhaven::media

@@ -6,13 +6,13 @@
 #include <utility>
 
 #include "standalone/base/log.h"
-#include "standalone/upkeep/mount_folder.h"
+#include "standalone/maintenance/mount_folder.h"
 
 namespace lookhaven::recorder {
 
 namespace {
 
-using upkeep::RecordingState;
+using maintenance::RecordingState;
 
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
@@ -160,12 +160,12 @@ void CameraRecording::CheckMount() {
     const std::filesystem::path path = event_ ? event_->Start().mount : order_.plan.mount;
     const int id = event_ ? event_->Start().mount_id : order_.plan.mount_id;
     Guard([&] {
-        const std::optional<upkeep::MountFolder> mount = upkeep::MountFolder::Open(path, id);
+        const std::optional<maintenance::MountFolder> mount = maintenance::MountFolder::Open(path, id);
         if (!mount) {
             Pause(RecordingState::kMountGone, "mount " + std::to_string(id) + " at " + path.string() + " is not there");
             return;
         }
-        const upkeep::MountSpace space = mount->Space();
+        const maintenance::MountSpace space = mount->Space();
         if (space.free_bytes < space.ReserveBytes() / (event_ ? 2 : 1)) {
             Pause(RecordingState::kDiskFull, "mount " + std::to_string(id) + " at " + path.string() + " is full");
         }

@@ -15,10 +15,10 @@
 #include <optional>
 #include <string>
 
+#include "standalone/maintenance/recording_state.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/event_file.h"
 #include "standalone/recorder/pre_record.h"
-#include "standalone/upkeep/recording_state.h"
 
 namespace lookhaven::recorder {
 
@@ -55,7 +55,7 @@ class CameraRecording {
     bool Flush(int event);
     void Close();
 
-    upkeep::RecordingState State() const { return state_; }
+    maintenance::RecordingState State() const { return state_; }
     int OpenEvent() const { return event_ ? event_->Start().id : 0; }
 
   private:
@@ -70,14 +70,14 @@ class CameraRecording {
     void CheckMount();
     template <class Work>
     bool Guard(Work&& work);
-    void Pause(upkeep::RecordingState state, const std::string& reason);
+    void Pause(maintenance::RecordingState state, const std::string& reason);
 
     const int camera_;
     const RecordingSurroundings surroundings_;
     RecordingOrder order_;
     PreRecord before_;  // frames while no event is open
     std::optional<EventFile> event_;
-    upkeep::RecordingState state_ = upkeep::RecordingState::kReady;
+    maintenance::RecordingState state_ = maintenance::RecordingState::kReady;
     std::int64_t last_picture_us_ = 0;
     std::int64_t last_flush_us_ = 0;
     std::int64_t next_mount_check_us_ = 0;

@@ -60,7 +60,7 @@ void Catalog::Read(store::Store& store) {
             if (credentials) {
                 plan.credentials = {credentials->account, credentials->password};
             }
-            contents->streams.emplace(ring::LiveStream{camera.id, profile.number}, std::move(plan));
+            contents->streams.emplace(control::LiveStream{camera.id, profile.number}, std::move(plan));
         }
         contents->cameras.emplace(camera.id, PlanOf(camera, plans, mounts));
     }

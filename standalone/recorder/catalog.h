@@ -36,7 +36,7 @@ struct CameraPlan {
 };
 
 struct CatalogContents {
-    std::map<ring::LiveStream, StreamPlan> streams;
+    std::map<control::LiveStream, StreamPlan> streams;
     std::map<int, CameraPlan> cameras;  // by id
 };
 

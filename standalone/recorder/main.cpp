@@ -14,6 +14,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/instance_lock.h"
 #include "standalone/recorder/supervisor.h"
 
@@ -38,7 +39,7 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
     const recorder::InstanceLock lock(installation);
     StopOnSignals();
     base::RaiseDescriptorLimit();  // each camera costs several
-    recorder::Supervisor supervisor(installation, no_data_limit);
+    recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit);
     base::LogInfo("started for " + installation.Home().string());
     while (g_stop == 0) {
         supervisor.Step();

@@ -15,7 +15,7 @@ constexpr std::int64_t kTickUs = 250'000;
 
 }  // namespace
 
-RecordingWorker::RecordingWorker(int camera, RecordingSurroundings surroundings, ring::FlushRequests& flush_requests)
+RecordingWorker::RecordingWorker(int camera, RecordingSurroundings surroundings, control::FlushRequests& flush_requests)
     : camera_(camera),
       surroundings_(std::move(surroundings)),
       flush_requests_(flush_requests),
@@ -35,7 +35,7 @@ void RecordingWorker::Flush(int event) {
     queue_->Wake();
 }
 
-upkeep::CameraRecordingState RecordingWorker::State() const {
+maintenance::CameraRecordingState RecordingWorker::State() const {
     const std::lock_guard lock(mutex_);
     return {camera_, state_, open_event_, queue_->LostFrames().frames, camera_name_};
 }

@@ -11,9 +11,9 @@
 #include <stop_token>
 #include <thread>
 
+#include "standalone/control/flush_request.h"
 #include "standalone/recorder/camera_recording.h"
 #include "standalone/recorder/frame_queue.h"
-#include "standalone/ring/flush_request.h"
 
 namespace lookhaven::recorder {
 
@@ -24,7 +24,7 @@ class RecordingWorker {
 
     // Starts the thread, which takes no signals. What is borrowed must outlive the worker. Throws std::system_error when
     // there is no thread to be had.
-    RecordingWorker(int camera, RecordingSurroundings surroundings, ring::FlushRequests& flush_requests);
+    RecordingWorker(int camera, RecordingSurroundings surroundings, control::FlushRequests& flush_requests);
 
     // Where the camera's frames go in; may outlive the worker.
     const std::shared_ptr<FrameQueue>& Queue() const { return queue_; }
@@ -34,7 +34,7 @@ class RecordingWorker {
 
     int OpenEvent() const { return open_event_; }
     // As the thread last published it.
-    upkeep::CameraRecordingState State() const;
+    maintenance::CameraRecordingState State() const;
 
     // Asks the thread to record what is queued, close the event and end; does not wait.
     void RequestStop() { thread_.request_stop(); }
@@ -49,14 +49,14 @@ class RecordingWorker {
 
     const int camera_;
     const RecordingSurroundings surroundings_;
-    ring::FlushRequests& flush_requests_;
+    control::FlushRequests& flush_requests_;
     const std::shared_ptr<FrameQueue> queue_;
     mutable std::mutex mutex_;
     std::optional<RecordingOrder> new_order_;
     std::string camera_name_;
     std::atomic<int> asked_flush_ = 0;
     std::atomic<int> open_event_ = 0;
-    std::atomic<upkeep::RecordingState> state_ = upkeep::RecordingState::kReady;
+    std::atomic<maintenance::RecordingState> state_ = maintenance::RecordingState::kReady;
     bool losses_reported_ = false;  // the thread's alone
     std::atomic<bool> has_ended_ = false;
     std::jthread thread_;  // last: it uses the others

@@ -6,10 +6,10 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
-#include "standalone/upkeep/marks.h"
-#include "standalone/upkeep/mount_folder.h"
-#include "standalone/upkeep/recovery.h"
-#include "standalone/upkeep/retention.h"
+#include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/recovery.h"
+#include "standalone/maintenance/retention.h"
 
 namespace lookhaven::recorder {
 
@@ -20,9 +20,9 @@ constexpr std::int64_t kRetentionUs = 10'000'000;
 // A mount that nothing was recorded to yet gets its mark; one that events are on and that lacks it is not there.
 void MarkNewMounts(store::Store& store) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (mount.enabled && upkeep::MountFolder::IsUnmarked(mount.path) &&
+        if (mount.enabled && maintenance::MountFolder::IsUnmarked(mount.path) &&
             store::Events(store).Content(mount.id).events == 0) {
-            upkeep::MountFolder::Mark(mount.path, mount.id);
+            maintenance::MountFolder::Mark(mount.path, mount.id);
         }
     }
 }
@@ -97,13 +97,13 @@ void Recordings::AnswerFlushes() {
 void Recordings::DoEverySecond() {
     ledger_.Refresh(entries_.size());
     caretaker_.Ask();
-    std::vector<upkeep::CameraRecordingState> states;
+    std::vector<maintenance::CameraRecordingState> states;
     for (const auto& [camera, entry] : entries_) {
         states.push_back(entry.worker->State());
     }
     try {
         if (states != published_) {
-            upkeep::WriteRecordingStates(installation_, states);
+            maintenance::WriteRecordingStates(installation_, states);
             published_ = std::move(states);
         }
     } catch (const std::exception& failure) {
@@ -111,8 +111,8 @@ void Recordings::DoEverySecond() {
     }
 }
 
-std::vector<ring::LiveStream> Recordings::Wanted() const {
-    std::vector<ring::LiveStream> streams;
+std::vector<control::LiveStream> Recordings::Wanted() const {
+    std::vector<control::LiveStream> streams;
     for (const auto& [camera, entry] : entries_) {
         if (!entry.ends) {
             streams.push_back(entry.stream);
@@ -121,7 +121,7 @@ std::vector<ring::LiveStream> Recordings::Wanted() const {
     return streams;
 }
 
-std::shared_ptr<FrameQueue> Recordings::QueueOf(ring::LiveStream stream) const {
+std::shared_ptr<FrameQueue> Recordings::QueueOf(control::LiveStream stream) const {
     const auto entry = entries_.find(stream.camera);
     return entry != entries_.end() && !entry->second.ends && entry->second.stream == stream
                ? entry->second.worker->Queue()
@@ -150,16 +150,16 @@ void Recordings::Care(store::Store& store) {
     const std::int64_t now_s = base::WallMillis() / 1000;
     MarkNewMounts(store);
     if (const std::optional<int> first = ledger_.FirstOwnId(); first && !std::exchange(recovered_, true)) {
-        upkeep::Recover(store, *first, now_s);
+        maintenance::Recover(store, *first, now_s);
     }
-    upkeep::CompleteMarks(store, now_s);
+    maintenance::CompleteMarks(store, now_s);
     const std::int64_t now_us = base::MonotonicMicros();
     if (!room_wanted_.exchange(false) && now_us < next_retention_us_) {
         return;
     }
     next_retention_us_ = now_us + kRetentionUs;
     for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (const upkeep::Removed removed = upkeep::Retain(store, mount, now_s); removed.events > 0) {
+        if (const maintenance::Removed removed = maintenance::Retain(store, mount, now_s); removed.events > 0) {
             base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(removed.events) +
                           " old events");
         }

@@ -24,9 +24,9 @@ class Recordings {
     void DoEverySecond();
 
     // The streams that must run to be recorded.
-    std::vector<ring::LiveStream> Wanted() const;
+    std::vector<control::LiveStream> Wanted() const;
     // Where the stream's frames go; null when it is not recorded.
-    std::shared_ptr<FrameQueue> QueueOf(ring::LiveStream stream) const;
+    std::shared_ptr<FrameQueue> QueueOf(control::LiveStream stream) const;
 
     // Asks all threads to end. Rows are stored after the last event is closed, so ask HasEnded until it is true.
     void RequestStop();
@@ -34,7 +34,7 @@ class Recordings {
 
   private:
     struct Entry {
-        ring::LiveStream stream;
+        control::LiveStream stream;
         std::unique_ptr<RecordingWorker> worker;
         bool ends = false;
     };
@@ -45,14 +45,14 @@ class Recordings {
 
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
-    ring::FlushRequests flush_requests_;
+    control::FlushRequests flush_requests_;
     EventLedger ledger_;
     std::atomic<bool> room_wanted_ = true;
     bool recovered_ = false;              // the caretaker's alone
     std::int64_t next_retention_us_ = 0;  // likewise
     StoreThread caretaker_;
     std::map<int, Entry> entries_;
-    std::vector<upkeep::CameraRecordingState> published_;
+    std::vector<maintenance::CameraRecordingState> published_;
     bool stores_last_rows_ = false;
 };
 

@@ -11,8 +11,8 @@
 #include <optional>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/demand.h"
 #include "standalone/media/packet.h"
-#include "standalone/ring/demand.h"
 #include "standalone/ring/writer.h"
 
 namespace lookhaven::recorder {
@@ -20,7 +20,7 @@ namespace lookhaven::recorder {
 class StreamRings {
   public:
     // Creates nothing yet. The installation must outlive this object.
-    StreamRings(const base::Installation& installation, ring::LiveStream stream)
+    StreamRings(const base::Installation& installation, control::LiveStream stream)
         : installation_(installation),
           stream_(stream) {}
 
@@ -46,7 +46,7 @@ class StreamRings {
               const ring::StreamEstimate& estimate);
 
     const base::Installation& installation_;
-    ring::LiveStream stream_;
+    control::LiveStream stream_;
     std::optional<Ring> video_;
     std::optional<Ring> audio_;
     std::optional<media::StreamFormat> video_format_;  // of this run

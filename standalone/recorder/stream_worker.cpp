@@ -15,16 +15,17 @@ namespace lookhaven::recorder {
 
 namespace {
 
-std::string Title(ring::LiveStream stream, const StreamPlan& plan) {
+std::string Title(control::LiveStream stream, const StreamPlan& plan) {
     return "camera " + std::to_string(stream.camera) + " \"" + plan.camera_name + "\" stream " +
            std::to_string(stream.stream) + ": ";
 }
 
 }  // namespace
 
-StreamWorker::StreamWorker(const base::Installation& installation, ring::LiveStream stream, StreamPlan plan,
-                           std::chrono::milliseconds no_data_limit)
+StreamWorker::StreamWorker(const base::Installation& installation, const media::SourceKinds& kinds,
+                           control::LiveStream stream, StreamPlan plan, std::chrono::milliseconds no_data_limit)
     : installation_(installation),
+      kinds_(kinds),
       stream_(stream),
       plan_(std::move(plan)),
       options_{plan_.credentials, no_data_limit},
@@ -60,7 +61,7 @@ void StreamWorker::Run(const std::stop_token& stop) {
 // Leaves by an exception only.
 void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
     bool live = false;
-    const std::unique_ptr<media::Source> source = media::OpenSource(plan_.url, options_, stop);
+    const std::unique_ptr<media::Source> source = media::OpenSource(kinds_, plan_.url, options_, stop);
     for (;;) {
         const media::Packet packet = source->Next();
         rings.Write(packet, source->Audio());

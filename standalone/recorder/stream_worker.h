@@ -14,11 +14,11 @@
 #include <thread>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/demand.h"
 #include "standalone/media/source.h"
 #include "standalone/recorder/backoff.h"
 #include "standalone/recorder/frame_queue.h"
 #include "standalone/recorder/stream_rings.h"
-#include "standalone/ring/demand.h"
 
 namespace lookhaven::recorder {
 
@@ -34,10 +34,10 @@ struct StreamPlan {
 
 class StreamWorker {
   public:
-    // Starts the stream's thread, which takes no signals. The installation must outlive the worker. Throws
+    // Starts the stream's thread, which takes no signals. Installation and kinds must outlive the worker. Throws
     // std::system_error when there is no thread to be had.
-    StreamWorker(const base::Installation& installation, ring::LiveStream stream, StreamPlan plan,
-                 std::chrono::milliseconds no_data_limit);
+    StreamWorker(const base::Installation& installation, const media::SourceKinds& kinds, control::LiveStream stream,
+                 StreamPlan plan, std::chrono::milliseconds no_data_limit);
 
     const StreamPlan& Plan() const { return plan_; }
 
@@ -57,7 +57,8 @@ class StreamWorker {
     void ReportFailure(const std::string& reason);
 
     const base::Installation& installation_;
-    const ring::LiveStream stream_;
+    const media::SourceKinds& kinds_;
+    const control::LiveStream stream_;
     const StreamPlan plan_;
     const media::SourceOptions options_;
     Backoff backoff_;

@@ -20,8 +20,10 @@ constexpr int kOrphanSearchSeconds = 60;
 
 }  // namespace
 
-Supervisor::Supervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit)
+Supervisor::Supervisor(const base::Installation& installation, media::SourceKinds kinds,
+                       std::chrono::milliseconds no_data_limit)
     : installation_(installation),
+      kinds_(std::move(kinds)),
       no_data_limit_(no_data_limit),
       demand_(installation),
       common_config_(installation),
@@ -81,11 +83,11 @@ void Supervisor::DoEverySecond() {
 void Supervisor::Reconcile() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     recordings_.Reconcile(*catalog);
-    std::vector<ring::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
-    const std::vector<ring::LiveStream> recorded = recordings_.Wanted();
+    std::vector<control::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
+    const std::vector<control::LiveStream> recorded = recordings_.Wanted();
     wanted.insert(wanted.end(), recorded.begin(), recorded.end());
-    std::map<ring::LiveStream, StreamPlan> plans;
-    for (const ring::LiveStream& stream : wanted) {
+    std::map<control::LiveStream, StreamPlan> plans;
+    for (const control::LiveStream& stream : wanted) {
         if (const auto plan = catalog->streams.find(stream); plan != catalog->streams.end()) {
             plans.insert(*plan);
         }
@@ -113,9 +115,9 @@ void Supervisor::DropEndedWorkers() {
     std::erase_if(workers_, [](const auto& entry) { return entry.second->HasEnded(); });
 }
 
-void Supervisor::Start(ring::LiveStream stream, const StreamPlan& plan) {
+void Supervisor::Start(control::LiveStream stream, const StreamPlan& plan) {
     try {
-        workers_.emplace(stream, std::make_unique<StreamWorker>(installation_, stream, plan, no_data_limit_));
+        workers_.emplace(stream, std::make_unique<StreamWorker>(installation_, kinds_, stream, plan, no_data_limit_));
         reported_failure_.clear();
     } catch (const std::exception& failure) {
         if (failure.what() != reported_failure_) {

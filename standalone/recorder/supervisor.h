@@ -13,11 +13,11 @@
 #include <string>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/common_config.h"
+#include "standalone/control/demand.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/recordings.h"
 #include "standalone/recorder/stream_worker.h"
-#include "standalone/ring/common_config.h"
-#include "standalone/ring/demand.h"
 
 namespace lookhaven::recorder {
 
@@ -25,7 +25,8 @@ class Supervisor {
   public:
     // Removes what a dead recorder of this installation left. The installation must outlive the supervisor. Throws
     // std::system_error when the shared tables cannot be made.
-    Supervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit);
+    Supervisor(const base::Installation& installation, media::SourceKinds kinds,
+               std::chrono::milliseconds no_data_limit);
 
     // One pass: waits up to a second for something to do and does it. A signal cuts the wait.
     void Step();
@@ -38,16 +39,17 @@ class Supervisor {
     void DoEverySecond();
     void Reconcile();
     void DropEndedWorkers();
-    void Start(ring::LiveStream stream, const StreamPlan& plan);
+    void Start(control::LiveStream stream, const StreamPlan& plan);
     std::chrono::milliseconds TimeToNextStep() const;
 
     const base::Installation& installation_;
+    const media::SourceKinds kinds_;
     std::chrono::milliseconds no_data_limit_;
-    ring::Demand demand_;
-    ring::CommonConfigKeeper common_config_;
+    control::Demand demand_;
+    control::CommonConfigKeeper common_config_;
     Catalog catalog_;
     Recordings recordings_;
-    std::map<ring::LiveStream, std::unique_ptr<StreamWorker>> workers_;
+    std::map<control::LiveStream, std::unique_ptr<StreamWorker>> workers_;
     std::int64_t next_second_us_ = 0;
     std::int64_t seconds_ = 0;
     bool common_config_refreshed_ = true;

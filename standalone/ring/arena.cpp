@@ -5,7 +5,7 @@
 #include <cstring>
 
 #include "standalone/base/clock.h"
-#include "standalone/ring/futex.h"
+#include "standalone/base/futex.h"
 
 namespace lookhaven::ring {
 
@@ -136,7 +136,7 @@ void Arena::Append(const Place& place, const Frame& frame, bool is_key) {
         has_lost_key_frame_ = false;
     }
     head.heartbeat_micros.store(base::MonotonicMicros());
-    Wake(head.wake);
+    base::Wake(head.wake);
 }
 
 }  // namespace lookhaven::ring

@@ -8,7 +8,7 @@
 #include <sys/shm.h>
 
 #include "standalone/base/clock.h"
-#include "standalone/ring/futex.h"
+#include "standalone/base/futex.h"
 #include "standalone/ring/process_word.h"
 #include "standalone/ring/reader_table.h"
 #include "standalone/ring/segment.h"
@@ -56,7 +56,7 @@ bool RemoveDeadWriters(const Attachment& attachment) {
         return false;
     }
     head.retired.store(1);
-    Wake(head.wake);
+    base::Wake(head.wake);
     attachment.RemoveSegment();
     return true;
 }

@@ -10,8 +10,8 @@
 #include <sys/shm.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/futex.h"
 #include "standalone/base/log.h"
-#include "standalone/ring/futex.h"
 #include "standalone/ring/process_word.h"
 #include "standalone/ring/reading.h"
 
@@ -108,7 +108,8 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
             }
         }
         const std::int64_t left = deadline - base::MonotonicMicros();
-        if (left <= 0 || head.retired.load() != 0 || !SleepWhile(head.wake, wake, std::chrono::microseconds(left))) {
+        if (left <= 0 || head.retired.load() != 0 ||
+            !base::SleepWhile(head.wake, wake, std::chrono::microseconds(left))) {
             return nullptr;
         }
     }

@@ -6,9 +6,9 @@
 #include <stdexcept>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/futex.h"
 #include "standalone/base/log.h"
 #include "standalone/ring/arena.h"
-#include "standalone/ring/futex.h"
 #include "standalone/ring/process_word.h"
 #include "standalone/ring/segment.h"
 
@@ -31,7 +31,7 @@ void Retire(const Attachment& attachment) {
     SegmentHead& head = View(attachment.Address()).Head();
     head.retired.store(1);
     head.writer.store(0);
-    Wake(head.wake);
+    base::Wake(head.wake);
     attachment.RemoveSegment();
 }
 

@@ -45,12 +45,6 @@ struct EmapSummary : Emap {
 
 constexpr int kMaxEmapItems = 1000;
 
-// Someone else changed the map since it was read; nothing was changed.
-class Conflict : public std::runtime_error {
-  public:
-    using std::runtime_error::runtime_error;
-};
-
 // Invariants    Every change raises Settings::Revision() in the same transaction.
 class Emaps {
   public:

@@ -48,6 +48,12 @@ class NotFound : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+// Someone else changed the record since it was read; nothing was changed.
+class Conflict : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
 class Connection;
 
 class Store {

@@ -10,15 +10,20 @@
 #include <CLI/CLI.hpp>
 #include <sysexits.h>
 
+#include "standalone/api/modules.h"
+#include "standalone/api/serve.h"
+#include "standalone/api/session_watcher.h"
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
-#include "standalone/webapi/listener.h"
-#include "standalone/webapi/modules.h"
-#include "standalone/webapi/server.h"
+#include "standalone/host/listener.h"
+#include "standalone/host/server.h"
 
 namespace base = lookhaven::base;
-namespace webapi = lookhaven::webapi;
+namespace api = lookhaven::api;
+namespace host = lookhaven::host;
+namespace http = lookhaven::http;
+namespace control = lookhaven::control;
 
 namespace {
 
@@ -26,7 +31,8 @@ struct Options {
     std::string home;
     std::string socket;
     std::vector<std::string> modules;
-    webapi::ServerLimits limits;
+    host::ServerLimits limits;
+    std::size_t max_requests_per_session = 64;
 };
 
 void AddMillis(CLI::App& app, const char* name, std::chrono::milliseconds& value, const char* text) {
@@ -44,7 +50,7 @@ void Describe(CLI::App& app, Options& options) {
     app.add_option("--socket", options.socket, "unix socket to listen on (run/webapi.sock in the state folder)");
     app.add_option("--module", options.modules, "web API module to serve; may be given several times");
     app.add_option("--max-requests", options.limits.requests, "requests running at once")->check(CLI::Range(1, 4096));
-    app.add_option("--max-requests-per-session", options.limits.requests_per_session, "of them, of one session")
+    app.add_option("--max-requests-per-session", options.max_requests_per_session, "of them, of one session")
         ->check(CLI::Range(1, 4096));
     AddMillis(app, "--read-seconds", options.limits.read, "for a request to arrive");
     AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is no stream");
@@ -54,14 +60,19 @@ void Describe(CLI::App& app, Options& options) {
 void Run(const Options& options) {
     const base::Installation installation =
         options.home.empty() ? base::Installation::FromEnvironment() : base::Installation(options.home);
-    webapi::Modules modules;
+    api::Modules modules;
     for (const std::string& module : options.modules) {
         modules.Load(module);
     }
     base::RaiseDescriptorLimit();  // each running request costs the host two
-    webapi::Listener listener(options.socket.empty() ? installation.WebApiSocket()
-                                                     : std::filesystem::path(options.socket));
-    webapi::Server server(installation, modules, listener.TakeSocket(), options.limits);
+    host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
+                                                   : std::filesystem::path(options.socket));
+    const api::Service service{installation, modules, options.max_requests_per_session};
+    const host::ChildWork work{
+        .serve_request = [&service](const http::Request& request, control::SlotTable& slots,
+                                    control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },
+        .watch_sessions = [&installation](control::SlotTable& slots) { api::WatchSessions(installation, slots); }};
+    host::Server server(installation, work, listener.TakeSocket(), options.limits);
     base::LogInfo("serving on " + listener.Name());
     server.Run();
 }
@@ -69,7 +80,7 @@ void Run(const Options& options) {
 }  // namespace
 
 int main(int count, char** arguments) {
-    webapi::OpenStandardDescriptors();
+    host::OpenStandardDescriptors();
     base::SetLogProgram("webapi");
     Options options;
     CLI::App app("Hosts web API modules behind a web server that speaks SCGI.");

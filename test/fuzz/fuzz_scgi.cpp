@@ -6,9 +6,9 @@
 #include <cstdlib>
 #include <string_view>
 
-#include "standalone/webapi/scgi.h"
+#include "standalone/host/scgi.h"
 
-using lookhaven::webapi::ScgiParser;
+using lookhaven::host::ScgiParser;
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     if (size < 2) {

@@ -12,7 +12,7 @@
 #include <unistd.h>
 
 #include "standalone/base/installation.h"
-#include "standalone/ring/common_config.h"
+#include "standalone/control/common_config.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/ring/writer.h"
 #include "standalone/store/connection.h"
@@ -68,7 +68,7 @@ class DoctorTest : public CliTest {
     }
 
     Outcome Examine() {
-        ring::CommonConfigKeeper(base::Installation(home_)).Refresh(false);
+        control::CommonConfigKeeper(base::Installation(home_)).Refresh(false);
         return Run("doctor");
     }
 

@@ -8,7 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "standalone/archive/recording.h"
-#include "standalone/upkeep/mount_folder.h"
+#include "standalone/maintenance/mount_folder.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 
@@ -16,7 +16,7 @@ namespace lookhaven::recorder {
 namespace {
 
 namespace fs = std::filesystem;
-using upkeep::RecordingState;
+using maintenance::RecordingState;
 
 constexpr std::int64_t kNoonMs = 1'772'366'400'000;
 constexpr int kFps = 25;
@@ -26,7 +26,7 @@ class CameraRecordingTest : public testing::Test {
     CameraRecordingTest() {
         for (const int mount : {1, 2}) {
             fs::create_directory(MountPath(mount));
-            upkeep::MountFolder::Mark(MountPath(mount), mount);
+            maintenance::MountFolder::Mark(MountPath(mount), mount);
         }
         order_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
         recording_.SetOrder(order_);
@@ -157,8 +157,8 @@ TEST_F(CameraRecordingTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
          [&] { Order([](RecordingOrder& order) { order.plan.mode = store::RecordMode::kAlways; }); }},
         {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
          [&] { fs::rename(hidden, MountPath(1)); }},
-        {RecordingState::kMountGone, true, [&] { upkeep::MountFolder::Mark(MountPath(1), 9); },
-         [&] { upkeep::MountFolder::Mark(MountPath(1), 1); }},
+        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::Mark(MountPath(1), 9); },
+         [&] { maintenance::MountFolder::Mark(MountPath(1), 1); }},
         {RecordingState::kNoMount, true, [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 0; }); },
          [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 1; }); }},
     };

@@ -3,8 +3,8 @@
 // A viewer so slow that the writer goes round it: what it gets can be decoded all the same.
 #include <random>
 
-#include "standalone/media/pattern_encoder.h"
-#include "standalone/media/scene.h"
+#include "standalone/pattern/pattern_encoder.h"
+#include "standalone/pattern/scene.h"
 #include "standalone/ring/writer.h"
 #include "test/component/recorder/recorder_fixture.h"
 
@@ -18,11 +18,11 @@ constexpr int kGroup = 12;
 
 // Real H.264 that may be repeated from the beginning without end.
 std::vector<Seen> Film() {
-    media::Scene scene(kWidth, kHeight, "Lapping");
-    const auto encoder = media::MakePatternEncoder("h264", {.width = kWidth, .height = kHeight, .gop = kGroup});
+    pattern::Scene scene(kWidth, kHeight, "Lapping");
+    const auto encoder = pattern::MakePatternEncoder("h264", {.width = kWidth, .height = kHeight, .gop = kGroup});
     std::vector<Seen> film;
     for (std::int64_t number = 0; number < 20 * kGroup; ++number) {
-        const media::EncodedPicture picture = encoder->Encode(scene.Draw(number, number * 40), number);
+        const pattern::EncodedPicture picture = encoder->Encode(scene.Draw(number, number * 40), number);
         film.push_back({{picture.data.begin(), picture.data.end()}, picture.key_frame, number * 40'000});
     }
     return film;

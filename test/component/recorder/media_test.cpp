@@ -18,6 +18,7 @@
 #include "standalone/media/probe.h"
 #include "standalone/media/source_url.h"
 #include "standalone/media/still.h"
+#include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/backoff.h"
 #include "standalone/recorder/stream_rings.h"
 #include "standalone/ring/inventory.h"
@@ -298,15 +299,19 @@ TEST(StreamRings, FitTheSizeOfTheLatestFormat) {
 }
 
 TEST(Probe, TellsWhatASourceSends) {
-    const ProbeResult result = ProbeSource("test:h264?size=320x240&fps=10&audio=aac", {}, std::chrono::seconds(5));
+    const ProbeResult result =
+        ProbeSource(pattern::AllSourceKinds(), "test:h264?size=320x240&fps=10&audio=aac", {}, std::chrono::seconds(5));
     EXPECT_EQ(result.video.codec, Codec::kH264);
     EXPECT_EQ(result.video.width, 320);
     EXPECT_NEAR(result.frames_per_second, 10, 0.5);
     ASSERT_TRUE(result.audio);
     EXPECT_EQ(result.audio->codec, Codec::kAac);
     MjpegCamera camera("viewer:se/cr@t");
-    EXPECT_EQ(ProbeSource(camera.Url(), {"viewer", "se/cr@t"}, std::chrono::seconds(5)).video.height, 48);
-    EXPECT_THROW(ProbeSource(camera.Url(), {"viewer", "wrong"}, std::chrono::seconds(5)), SourceError);
+    EXPECT_EQ(ProbeSource(pattern::AllSourceKinds(), camera.Url(), {"viewer", "se/cr@t"}, std::chrono::seconds(5))
+                  .video.height,
+              48);
+    EXPECT_THROW(ProbeSource(pattern::AllSourceKinds(), camera.Url(), {"viewer", "wrong"}, std::chrono::seconds(5)),
+                 SourceError);
 }
 
 TEST(Probe, LeavesOutSoundWhoseNameDoesNotTellItsForm) {
@@ -322,7 +327,7 @@ TEST(Probe, LeavesOutSoundWhoseNameDoesNotTellItsForm) {
         const std::string command =
             "ffmpeg -v error -y -f lavfi -i testsrc=s=64x48:d=2 -f lavfi -i sine=d=2 -c:v libx264 -c:a ";
         ASSERT_EQ(std::system((command + row.sound + " " + path).c_str()), 0);
-        const ProbeResult result = ProbeSource("file:" + path, {}, std::chrono::seconds(5));
+        const ProbeResult result = ProbeSource(pattern::AllSourceKinds(), "file:" + path, {}, std::chrono::seconds(5));
         EXPECT_EQ(result.video.codec, Codec::kH264);
         EXPECT_EQ(result.audio ? std::optional(result.audio->codec) : std::nullopt, row.codec);
     }
@@ -343,7 +348,7 @@ TEST(Source, LeavesAnyWaitAtAStopRequest) {
     camera.SetMood(MjpegCamera::Mood::kStall);
     for (const std::string& url : {camera.Url(), std::string("test:mjpeg?fps=1&size=160x120")}) {
         std::stop_source stop;
-        const std::unique_ptr<Source> source = OpenSource(url, {}, stop.get_token());
+        const std::unique_ptr<Source> source = OpenSource(pattern::AllSourceKinds(), url, {}, stop.get_token());
         std::jthread stopper([&] { stop.request_stop(); });
         const auto begin = std::chrono::steady_clock::now();
         EXPECT_THROW(

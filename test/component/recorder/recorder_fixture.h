@@ -13,8 +13,8 @@
 #include <gtest/gtest.h>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/demand.h"
 #include "standalone/media/packet.h"
-#include "standalone/ring/demand.h"
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
 
@@ -71,7 +71,7 @@ class Viewer {
 
     const base::Installation& installation_;
     ring::StreamId id_;
-    ring::Demand demand_;
+    control::Demand demand_;
     void* ring_ = nullptr;
     ring::Position position_;
     int last_sequence_ = ring::kNoSequence;

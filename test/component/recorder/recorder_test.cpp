@@ -87,7 +87,7 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     MjpegCamera page;
     page.SetMood(MjpegCamera::Mood::kPage);
     Viewer good(*installation_, AddCamera(kSmallPattern));
-    ring::Demand demand(*installation_);
+    control::Demand demand(*installation_);
     const std::vector<std::pair<std::string, std::string>> bad{
         {"test:nonsense", "no test pattern"},
         {"test:mjpeg?size=1x1", "has a size"},
@@ -168,7 +168,7 @@ TEST_F(RecorderTest, EndsInOrder) {
     MjpegCamera stalled;
     stalled.SetMood(MjpegCamera::Mood::kStall);
     Viewer live(*installation_, AddCamera("test:h264?size=160x120&audio=aac"));
-    ring::Demand demand(*installation_);
+    control::Demand demand(*installation_);
     demand.Touch({AddCamera(stalled.Url()), 0});
     demand.Touch({AddCamera("http://127.0.0.1:1/"), 0});
     for (const int signal : {SIGTERM, SIGINT}) {

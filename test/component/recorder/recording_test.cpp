@@ -17,12 +17,12 @@
 #include "standalone/archive/recording.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/maintenance/recording_state.h"
+#include "standalone/maintenance/verify.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
-#include "standalone/upkeep/recording_state.h"
-#include "standalone/upkeep/verify.h"
 #include "test/component/recorder/recorder_fixture.h"
 #include "test/support/postgres/temporary_postgres.h"
 
@@ -93,7 +93,7 @@ class RecordingTest : public RecorderTest, public testing::WithParamInterface<st
     // Every event, however it ended, is whole to an independent reader and to the store.
     void ExpectSound() const {
         store::Store store = Store();
-        for (const upkeep::Fault& fault : upkeep::Verify(store, false).faults) {
+        for (const maintenance::Fault& fault : maintenance::Verify(store, false).faults) {
             ADD_FAILURE() << fault.problem;
         }
         store::Events(store).VisitMount(1, [&](const store::Event& event) {
@@ -186,24 +186,25 @@ TEST_P(RecordingTest, AFullDiskPausesRecordingAloneUntilThereIsRoom) {
     const int camera = AddCamera("test:mjpeg?size=1280x720&fps=25");
     SetPlan(camera, store::RecordMode::kAlways);
     const Child recorder = StartRecorder();
-    const auto is_in = [&](upkeep::RecordingState state) {
-        const auto states = upkeep::ReadRecordingStates(*installation_);
+    const auto is_in = [&](maintenance::RecordingState state) {
+        const auto states = maintenance::ReadRecordingStates(*installation_);
         return states.size() == 1 && states.front().state == state;
     };
     Viewer viewer(*installation_, camera);
     for (int round = 0; round < 2; ++round) {
-        ASSERT_TRUE(Eventually([&] { return is_in(upkeep::RecordingState::kRecording) && !Open().empty(); })) << Log();
+        ASSERT_TRUE(Eventually([&] { return is_in(maintenance::RecordingState::kRecording) && !Open().empty(); }))
+            << Log();
         std::this_thread::sleep_for(seconds(1));
         // Another program takes all there is.
         const base::FileDescriptor greedy = base::OpenFile(Folder() / "greedy", O_WRONLY | O_CREAT, 0600);
         for (const std::string block(4096, 'x'); ::write(greedy.Get(), block.data(), block.size()) > 0;) {
         }
-        EXPECT_TRUE(Eventually([&] { return is_in(upkeep::RecordingState::kDiskFull); })) << Log();
+        EXPECT_TRUE(Eventually([&] { return is_in(maintenance::RecordingState::kDiskFull); })) << Log();
         EXPECT_TRUE(Eventually([&] { return Open().empty(); })) << "what cannot go on is finished";
         viewer.Take(50);  // the live picture goes on
         fs::remove(Folder() / "greedy");
     }
-    ASSERT_TRUE(Eventually([&] { return is_in(upkeep::RecordingState::kRecording); })) << Log();
+    ASSERT_TRUE(Eventually([&] { return is_in(maintenance::RecordingState::kRecording); })) << Log();
     // The disk fills by itself now, and the old makes room for the new.
     const std::size_t before = LogLines("old events");
     EXPECT_TRUE(Eventually([&] { return LogLines("old events") > before; }, seconds(60))) << Log();

@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/admit.h"
+
+#include "standalone/api/session_cookie.h"
+#include "standalone/base/clock.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/sessions.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+// Looks at its callers itself; every other API of a module needs a session.
+constexpr const char* kSelfAdmittingApi = "VEXO.Lookhaven.Player.LiveviewSrc";
+
+bool IsCrossSite(const http::Request& request) {
+    if (const std::string_view site = request.Header("HTTP_SEC_FETCH_SITE"); !site.empty()) {
+        return site != "same-origin" && site != "none";
+    }
+    const std::string_view origin = request.Header("HTTP_ORIGIN");
+    if (origin.empty()) {
+        return false;
+    }
+    const std::size_t scheme_end = origin.find("://");
+    return scheme_end == origin.npos || origin.substr(scheme_end + 3) != request.Header("HTTP_HOST");
+}
+
+}  // namespace
+
+void CheckOrigin(const http::Request& request) {
+    const std::string_view method = request.Header("REQUEST_METHOD");
+    if (method != "GET" && method != "POST") {
+        throw Failure(405, "GET and POST only");
+    }
+    if (method == "POST" && IsCrossSite(request)) {
+        throw Failure(403, "another site's page may not ask for this");
+    }
+}
+
+std::optional<binding::Login> FindLogin(const Call& call) {
+    const auto cookie = call.cookies.find(kSessionCookie);
+    if (cookie == call.cookies.end() || cookie->second.empty()) {
+        return std::nullopt;
+    }
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    store::Sessions sessions(call.Records());
+    const auto session = sessions.FindBySecret(cookie->second, now_s);
+    if (!session) {
+        return std::nullopt;
+    }
+    sessions.Touch(*session, now_s);
+    return binding::Login{static_cast<unsigned int>(session->user.id), session->user.name, session->handle,
+                          session->user.IsManager()};
+}
+
+void Admit(Call& call, std::size_t max_requests) {
+    call.login = FindLogin(call);
+    const Json::Value& priv_data = call.Parameter("privData");
+    call.context.Renounce(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
+    if (!call.login) {
+        if (call.api != kSelfAdmittingApi) {
+            throw Failure(401, "no session");
+        }
+        return;
+    }
+    call.context.SetCaller(call.login->user_id);
+    call.context.SetSession(call.login->session_handle);
+    control::SlotTable::SetSession(call.slot, call.login->session_handle);
+    if (call.slots.OlderOfSession(call.slot) >= max_requests) {
+        throw Failure(503, "too many requests of this session are running");
+    }
+}
+
+}  // namespace lookhaven::api

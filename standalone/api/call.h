@@ -1,0 +1,47 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One call of a web API: the request, read once, and what a method needs to answer it.
+#pragma once
+
+#include <map>
+#include <optional>
+#include <string>
+
+#include <json/json.h>
+
+#include "standalone/api/parameters.h"
+#include "standalone/binding/request.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/control/slot_table.h"
+#include "standalone/http/answer.h"
+#include "standalone/http/request.h"
+
+namespace lookhaven::api {
+
+using http::Failure;
+
+// Borrows all that it refers to; lives as long as its request process.
+struct Call {
+    const http::Request& request;
+    std::string api;
+    int version = 0;
+    std::string method;
+    Parameters parameters;
+    std::map<std::string, std::string> cookies;
+    std::optional<binding::Login> login;  // of the cookie's session; looked up for APIs that need one
+
+    binding::RequestContext& context;
+    control::SlotTable& slots;
+    control::Slot& slot;  // this process's
+
+    // The parameter's value; null when it is missing.
+    const Json::Value& Parameter(const std::string& name) const;
+    // The parameter's number, otherwise when it is missing. Throws Json::Exception for what is no number.
+    std::int64_t NumberOr(const std::string& name, std::int64_t otherwise) const;
+    store::Store& Records() const { return context.Records(); }
+};
+
+// {"success": true, "data": data}. extra: further head lines, each ending in CR LF.
+std::string SuccessAnswer(const Json::Value& data, const std::string& extra = "");
+
+}  // namespace lookhaven::api

@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see.
+#include "standalone/api/own_apis.h"
+
+#include "platform/camera/camgroup.h"
+#include "platform/privilege/privprofile.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/emaps.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+template <typename Records>
+Json::Value IdsOf(const Records& cameras) {
+    Json::Value ids(Json::arrayValue);
+    for (const auto& [id, camera] : cameras) {
+        ids.append(id);
+    }
+    return ids;
+}
+
+std::string Groups(const Call& call) {
+    const std::set<int> denied = PrivProfileGetByUid(call.context.Caller()).GetInaPrivPerCamGrpIdSet(CAM_PRIV_PLAYBACK);
+    Json::Value data;
+    Json::Value& list = data["group"] = Json::arrayValue;
+    for (const store::CameraGroup& group : store::Groups(call.Records()).List()) {
+        CamGroup cameras;
+        if (!denied.contains(group.id) && cameras.Load(group.id) == 0) {
+            Json::Value& json = list.append(Json::objectValue);
+            json["id"] = group.id;
+            json["name"] = group.name;
+            json["camera"] = IdsOf(cameras.GetCamMap());
+        }
+    }
+    return SuccessAnswer(data);
+}
+
+// A mount without a camera that the caller may see is nothing to a viewer.
+std::string Mounts(const Call& call) {
+    const bool is_manager = binding::IsManager();
+    Json::Value data;
+    Json::Value& list = data["mount"] = Json::arrayValue;
+    for (const store::Mount& mount : store::Mounts(call.Records()).List()) {
+        Json::Value cameras = IdsOf(GetCamMountMap(mount.id, "", true));
+        if (is_manager || !cameras.empty()) {
+            Json::Value& json = list.append(Json::objectValue);
+            json["id"] = mount.id;
+            json["name"] = mount.name;
+            json["is_default"] = mount.is_default;
+            json["enabled"] = mount.enabled;
+            json["camera"] = std::move(cameras);
+        }
+    }
+    return SuccessAnswer(data);
+}
+
+std::string Emaps(const Call& call) {
+    Json::Value data;
+    Json::Value& list = data["emap"] = Json::arrayValue;
+    for (const store::EmapSummary& emap : store::Emaps(call.Records()).List()) {
+        if (binding::MaySee(store::DeniableItem::kEmap, emap.id)) {
+            Json::Value& json = list.append(Json::objectValue);
+            json["id"] = emap.id;
+            json["name"] = emap.name;
+            json["item_num"] = emap.item_count;
+        }
+    }
+    return SuccessAnswer(data);
+}
+
+constexpr Method kMethods[] = {{"Groups", Groups}, {"Mounts", Mounts}, {"Emaps", Emaps}};
+
+}  // namespace
+
+const OwnApi kCatalogApi{"VEXO.Catalog", kMethods};
+
+}  // namespace lookhaven::api

@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/download.h"
+
+#include <cstdio>
+#include <filesystem>
+#include <string>
+
+#include <unistd.h>
+
+#include "standalone/archive/recording.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/binding/rights.h"
+#include "standalone/media/libav_libraries.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+struct Footage {
+    int camera_id = 0;
+    int mount_id = 0;
+    std::int64_t start_s = 0;
+    std::string path;  // relative to the mount
+};
+
+std::optional<Footage> Find(store::Store& records, std::optional<store::MarkKind> kind, int id) {
+    if (kind) {
+        const auto mark = store::Marks(records).Find(*kind, id);
+        const bool saved = mark && mark->state == store::MarkState::kSaved && !mark->demo;
+        return saved ? std::optional(Footage{mark->camera_id, mark->mount_id, mark->start_s, mark->path})
+                     : std::nullopt;
+    }
+    const auto event = store::Events(records).Find(id);
+    return event && !event->demo
+               ? std::optional(Footage{event->camera_id, event->mount_id, event->start_s, event->path})
+               : std::nullopt;
+}
+
+// "Entrance 2026-03-01 08.15.30Z"
+std::string TitleOf(store::Store& records, const Footage& footage) {
+    const auto camera = store::Cameras(records).Find(footage.camera_id);
+    std::string time = base::FormatUtc(footage.start_s * 1000);  // 2026-03-01T08:15:30.000Z
+    time = time.substr(0, 10) + ' ' + time.substr(11, 2) + '.' + time.substr(14, 2) + '.' + time.substr(17, 2) + 'Z';
+    return (camera ? camera->name : "Camera " + std::to_string(footage.camera_id)) + ' ' + time;
+}
+
+// Both spellings: one for every client, one that keeps the camera's name as it is.
+std::string Disposition(const std::string& title) {
+    std::string plain;
+    std::string encoded;
+    for (const char character : title + ".mkv") {
+        const auto byte = static_cast<unsigned char>(character);
+        const bool is_safe = std::isalnum(byte) != 0 || character == '.' || character == '-';
+        plain += is_safe || character == ' ' ? character : '_';
+        if (is_safe) {
+            encoded += character;
+        } else {
+            encoded += '%';
+            encoded += "0123456789ABCDEF"[byte >> 4];
+            encoded += "0123456789ABCDEF"[byte & 15];
+        }
+    }
+    return "attachment; filename=\"" + plain + "\"; filename*=UTF-8''" + encoded;
+}
+
+}  // namespace
+
+void Download(const Call& call, std::optional<store::MarkKind> kind, int event) {
+    store::Store& records = call.Records();
+    const auto footage = Find(records, kind, event);
+    const auto mount = footage ? store::Mounts(records).Find(footage->mount_id) : std::nullopt;
+    const auto path = mount ? std::filesystem::path(mount->path) / footage->path : std::filesystem::path();
+    if (!mount || !binding::MayUse(footage->camera_id, store::CameraAccess::kPlayback) ||
+        !std::filesystem::exists(path)) {
+        throw Failure(404, "there is no such event, or no footage of it");
+    }
+    media::ExportOptions options;
+    options.with_sound = binding::MayUse(footage->camera_id, store::CameraAccess::kAudio);
+    const std::string head = "Status: 200 OK\r\nContent-Type: video/x-matroska\r\nCache-Control: no-store\r\n"
+                             "Content-Disposition: " +
+                             Disposition(TitleOf(records, *footage)) + "\r\n\r\n";
+    call.context.CloseRecords();
+    call.context.NoteStream();
+    // What cannot be read at all should be said while there still is an answer to give.
+    if (archive::Recording(path).FrameCount() == 0) {
+        throw Failure(404, "nothing of the event is recorded yet");
+    }
+    const media::RemuxLibrary& library = media::LoadRemuxLibrary();
+    std::fwrite(head.data(), 1, head.size(), stdout);
+    std::fflush(stdout);
+    library.Copy(path, STDOUT_FILENO, options);
+}
+
+}  // namespace lookhaven::api

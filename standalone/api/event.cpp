@@ -1,0 +1,179 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Event: report what happened at a camera, list it, download its footage.
+#include "standalone/api/own_apis.h"
+
+#include <algorithm>
+#include <optional>
+
+#include "platform/camera/camgroup.h"
+#include "platform/recording/eventsearch.h"
+#include "standalone/api/download.h"
+#include "standalone/base/clock.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::int64_t kMaxAheadSeconds = 3600;  // a till's clock may be off
+constexpr int kMaxListed = 10'000;
+
+std::optional<store::MarkKind> KindOf(const Call& call) {
+    const Json::Value kind = call.Parameter("kind");
+    if (kind.isNull()) {
+        return std::nullopt;
+    }
+    if (kind == "alert" || kind == "pos") {
+        return kind == "alert" ? store::MarkKind::kAlert : store::MarkKind::kPos;
+    }
+    throw Failure(400, "kind must be alert or pos");
+}
+
+// One text, or a list of lines.
+std::string TextOf(const Json::Value& text) {
+    if (!text.isArray()) {
+        return text.asString();
+    }
+    std::string joined;
+    for (const Json::Value& line : text) {
+        joined += (joined.empty() ? "" : "\n") + line.asString();
+    }
+    return joined;
+}
+
+Json::Value LinesOf(const std::string& text) {
+    Json::Value lines(Json::arrayValue);
+    for (std::size_t at = 0; at < text.size();) {
+        const std::size_t end = std::min(text.find('\n', at), text.size());
+        lines.append(text.substr(at, end - at));
+        at = end + 1;
+    }
+    return lines;
+}
+
+const char* NameOf(store::MarkState state) {
+    return state == store::MarkState::kSaved ? "saved" : state == store::MarkState::kMissed ? "missed" : "pending";
+}
+
+Json::Value Describe(const store::Mark& mark) {
+    Json::Value json;
+    json["id"] = mark.id;
+    json["kind"] = mark.kind == store::MarkKind::kAlert ? "alert" : "pos";
+    json["camera_id"] = mark.camera_id;
+    json["time"] = Json::Int64{mark.moment_s};
+    json["start"] = Json::Int64{mark.start_s};
+    json["stop"] = Json::Int64{mark.end_s};
+    json["state"] = NameOf(mark.state);
+    json["text"] = LinesOf(mark.text);
+    return json;
+}
+
+// With the names that the search of recorded events has for them.
+Json::Value Describe(const store::Event& event) {
+    Json::Value json;
+    json["id"] = event.id;
+    json["kind"] = "event";
+    json["camera_id"] = event.camera_id;
+    json["start"] = Json::Int64{event.start_s};
+    json["stop"] = Json::Int64{event.end_s};
+    json["frame_count"] = event.frame_count;
+    json["record_type"] = event.reason;
+    json["is_recording"] = event.recording;
+    return json;
+}
+
+template <typename AnyEvent>
+std::string AnswerVisible(const std::optional<AnyEvent>& event) {
+    if (!event || !binding::MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
+        throw Failure(404, "there is no such event");
+    }
+    return SuccessAnswer(Describe(*event));
+}
+
+std::string Get(const Call& call) {
+    const std::optional<store::MarkKind> kind = KindOf(call);
+    const int id = call.Parameter("event").asInt();
+    return kind ? AnswerVisible(store::Marks(call.Records()).Find(*kind, id))
+                : AnswerVisible(store::Events(call.Records()).Find(id));
+}
+
+std::string MarkIt(const Call& call) {
+    const auto kind = KindOf(call);
+    if (!kind) {
+        throw Failure(400, "kind must be alert or pos");
+    }
+    const int camera = static_cast<int>(call.Parameter("camera").asInt());
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t start_s = call.NumberOr("start", now_s);
+    const std::int64_t length_s = call.NumberOr("length", 0);
+    if (camera < 1 || start_s < 1 || start_s > now_s + kMaxAheadSeconds || length_s < 0 ||
+        length_s > store::kMaxMarkSeconds) {
+        throw Failure(400, "camera, start or length is out of its bounds");
+    }
+    if (!binding::MayUse(camera, store::CameraAccess::kPlayback)) {
+        throw Failure(403, "you may not see this camera");
+    }
+    try {
+        return SuccessAnswer(Describe(
+            store::Marks(call.Records()).Add(*kind, camera, start_s, length_s, TextOf(call.Parameter("text")))));
+    } catch (const store::NotFound&) {
+        throw Failure(404, "there is no such camera");
+    }
+}
+
+// The cameras asked for, or all, without those that the caller may not play back.
+std::set<int> CamerasOf(const Call& call) {
+    const Json::Value asked = call.Parameter("cameralists");
+    std::set<int> ids;
+    if (!asked.isNull()) {
+        const std::list<int> numbers = String2IntList(asked.asString(), ",");
+        ids.insert(numbers.begin(), numbers.end());
+        const std::set<int> denied = binding::DeniedCameras(store::CameraAccess::kPlayback);
+        std::erase_if(ids, [&denied](int id) { return denied.contains(id); });
+        return ids;
+    }
+    for (const auto& [id, camera] : GetCamMountMap(0, "", true)) {
+        ids.insert(id);
+    }
+    return ids;
+}
+
+std::string List(const Call& call) {
+    store::MarkFilter filter;
+    filter.camera_ids = CamerasOf(call);
+    filter.kind = KindOf(call);
+    filter.begin_s = call.NumberOr("from", 0);
+    filter.end_s = call.NumberOr("to", base::WallMillis() / 1000 + kMaxAheadSeconds);
+    filter.newest_first = true;
+    const std::int64_t offset = call.NumberOr("offset", 0);
+    const std::int64_t limit = call.NumberOr("limit", 1000);
+    if (filter.end_s <= filter.begin_s || offset < 0 || offset > std::numeric_limits<int>::max() || limit < 1 ||
+        limit > kMaxListed) {
+        throw Failure(400, "from, to, offset or limit is out of its bounds");
+    }
+    filter.offset = static_cast<int>(offset);
+    filter.limit = static_cast<int>(limit);
+    Json::Value data;
+    data["event"] = Json::arrayValue;
+    for (const store::Mark& mark : store::Marks(call.Records()).List(filter)) {
+        data["event"].append(Describe(mark));
+    }
+    return SuccessAnswer(data);
+}
+
+std::string DownloadIt(const Call& call) {
+    Download(call, KindOf(call), call.Parameter("event").asInt());
+    return "";
+}
+
+constexpr Method kMethods[] = {
+    {"Mark", MarkIt, Method::Effect::kChanges}, {"List", List}, {"Get", Get}, {"Download", DownloadIt}};
+
+}  // namespace
+
+const OwnApi kEventApi{"VEXO.Event", kMethods};
+
+}  // namespace lookhaven::api

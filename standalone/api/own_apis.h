@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The APIs that the host itself serves, beside those of its modules: a table each, in a file each.
+#pragma once
+
+#include <span>
+#include <string>
+
+#include "standalone/api/call.h"
+
+namespace lookhaven::api {
+
+struct Method {
+    const char* name;
+    // The whole answer; empty when it went to standard output already. Throws Failure for what the caller did wrong or
+    // cannot have.
+    std::string (*serve)(const Call& call);
+    enum class Effect { kReads, kChanges } effect = Effect::kReads;  // what changes something takes POST only
+    enum class Audience { kEverybody, kManagers } audience = Audience::kEverybody;
+};
+
+// Every API is at version 1.
+struct OwnApi {
+    const char* name;
+    std::span<const Method> methods;
+    bool needs_session = true;
+
+    // Throws Failure 404 when it has no such method.
+    const Method& Find(int version, const std::string& method) const;
+};
+
+extern const OwnApi kAuthApi;      // log in, log out, who am I
+extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
+extern const OwnApi kEmapApi;      // what an editor of e-maps needs, and the states of doors and ports
+extern const OwnApi kEventApi;     // report what happened at a camera, list it, download its footage
+extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends
+extern const OwnApi kPlaybackApi;  // steers a running player of the caller's session
+extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
+
+// Null when the host serves no such API.
+const OwnApi* FindOwnApi(const std::string& name);
+
+}  // namespace lookhaven::api

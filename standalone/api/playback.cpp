@@ -1,0 +1,142 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Playback: steers a running player of the caller's session through its progress file and signals.
+#include <algorithm>
+#include <chrono>
+#include <thread>
+
+#include "standalone/api/own_apis.h"
+#include "standalone/control/player_file.h"
+#include "standalone/control/progress_file.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr int kMaxRate = 16;
+constexpr int kMinRate = -8;
+constexpr std::chrono::milliseconds kSignalPoll{2};
+constexpr std::chrono::milliseconds kSignalLimit{1'000};
+
+// The slot of the player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such player.
+control::Slot& PlayerSlot(const Call& call) {
+    const std::int64_t key = call.NumberOr("timestamp", 0);
+    if (key < 1) {
+        throw Failure(400, "timestamp must be the number that the player was started with");
+    }
+    control::Slot* slot = call.slots.FindPlayer(call.context.Session(), key);
+    if (slot == nullptr) {
+        throw Failure(404, "this session has no such player");
+    }
+    return *slot;
+}
+
+control::ProgressFile ProgressOf(const Call& call, const control::Player& player) {
+    auto file = control::ProgressFile::Open(call.context.Home().ProgressFolder(), player.key, call.context.Session());
+    if (!file) {
+        throw Failure(409, "the player cannot be reached under this timestamp");
+    }
+    return *std::move(file);
+}
+
+std::string SetRate(const Call& call) {
+    control::Player& player = PlayerSlot(call).player;
+    const Json::Value& asked = call.Parameter("rate");
+    const int rate = asked.isInt() ? asked.asInt() : 0;
+    if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
+        throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
+    }
+    if (!player.takes_rate) {
+        throw Failure(409, "this player does not take its rate from here");
+    }
+    const bool waits = player.pause_wanted && rate > 1;
+    player.resumed_rate = waits ? rate : 0;
+    if (!ProgressOf(call, player).Set(waits ? 1 : rate)) {
+        throw Failure(409, "the player has been replaced");
+    }
+    Json::Value data;
+    data["rate"] = rate;
+    return SuccessAnswer(data);
+}
+
+std::string GetPosition(const Call& call) {
+    const control::Player& player = PlayerSlot(call).player;
+    if (!player.tells_position) {
+        throw Failure(409, "this player does not tell its position here");
+    }
+    const int position_ms = ProgressOf(call, player).Get();
+    Json::Value data;
+    data["position_ms"] = position_ms == control::ProgressFile::kUnset ? Json::Value() : Json::Value(position_ms);
+    return SuccessAnswer(data);
+}
+
+// Waits until the host has told the player of its pause.
+void AwaitPause(const Call& call, const control::Slot& slot, bool on) {
+    call.slots.Wake();
+    const std::uint64_t serial = slot.serial;
+    const auto until = std::chrono::steady_clock::now() + kSignalLimit;
+    while (slot.player.paused != on) {
+        if (slot.serial != serial || std::chrono::steady_clock::now() > until) {
+            throw Failure(503, "the player was not reached in time");
+        }
+        std::this_thread::sleep_for(kSignalPoll);
+    }
+}
+
+std::string Pause(const Call& call) {
+    control::Slot& slot = PlayerSlot(call);
+    control::Player& player = slot.player;
+    const Json::Value& asked = call.Parameter("on");
+    if (!asked.isBool()) {
+        throw Failure(400, "on must be true or false");
+    }
+    const bool on = asked.asBool();
+    if (!player.can_pause) {
+        throw Failure(409, "this player cannot be paused");
+    }
+    if (on && player.takes_rate) {
+        control::ProgressFile progress = ProgressOf(call, player);
+        if (const int rate = progress.Get(); rate > 1) {
+            player.resumed_rate = rate;
+            progress.Set(1);
+        }
+    }
+    player.pause_wanted = on;
+    AwaitPause(call, slot, on);
+    if (const int rate = on ? 0 : player.resumed_rate.exchange(0); rate != 0) {
+        ProgressOf(call, player).Set(rate);
+    }
+    Json::Value data;
+    data["on"] = on;
+    return SuccessAnswer(data);
+}
+
+// Has a player that a newer one has replaced look at its file now.
+std::string CheckOwner(const Call& call) {
+    const control::Slot& slot = PlayerSlot(call);
+    const std::string& session = call.context.Session();
+    const std::vector<control::Slot*> surplus = call.slots.SurplusPlayers(session, control::ReadPlayerFile(session));
+    call.slots.Wake();
+    Json::Value data;
+    data["owner"] = std::find(surplus.begin(), surplus.end(), &slot) == surplus.end();
+    return SuccessAnswer(data);
+}
+
+std::string Stop(const Call& call) {
+    call.slots.End(PlayerSlot(call));
+    return SuccessAnswer(Json::nullValue);
+}
+
+using enum Method::Effect;
+
+constexpr Method kMethods[] = {{"SetRate", SetRate, kChanges},
+                               {"GetPosition", GetPosition},
+                               {"Pause", Pause, kChanges},
+                               {"CheckOwner", CheckOwner, kChanges},
+                               {"Stop", Stop, kChanges}};
+
+}  // namespace
+
+const OwnApi kPlaybackApi{"VEXO.Playback", kMethods};
+
+}  // namespace lookhaven::api

@@ -1,0 +1,21 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which methods start a player of recordings, and what that player can do.
+#pragma once
+
+#include "standalone/api/call.h"
+
+namespace lookhaven::api {
+
+// True for the methods that start a player.
+bool IsPlayer(const Call& call);
+
+// How many players a session may have side by side: the setting players_per_session, 1 … 16, or 1. Throws
+// store::StoreError.
+int PlayersPerSession(store::Store& records);
+
+// Notes in the call's slot what the player that it starts can do. Throws store::StoreError; Json::Exception for
+// parameters of the wrong type.
+void PreparePlayer(const Call& call);
+
+}  // namespace lookhaven::api

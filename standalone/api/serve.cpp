@@ -1,0 +1,160 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/serve.h"
+
+#include <cstdio>
+
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include "standalone/api/admit.h"
+#include "standalone/api/own_apis.h"
+#include "standalone/api/player.h"
+#include "standalone/base/log.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr rlim_t kMaxAddressSpace = rlim_t{1} << 30;
+
+// Under a sanitizer a process maps terabytes before main.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr bool kLimitAddressSpace = false;
+#else
+constexpr bool kLimitAddressSpace = true;
+#endif
+
+void LimitAddressSpace(bool limited) {
+    rlimit limit{};
+    if (kLimitAddressSpace && ::getrlimit(RLIMIT_AS, &limit) == 0) {
+        limit.rlim_cur = limited && kMaxAddressSpace < limit.rlim_max ? kMaxAddressSpace : limit.rlim_max;
+        ::setrlimit(RLIMIT_AS, &limit);
+    }
+}
+
+Call ReadCall(const http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+    Call call{.request = request,
+              .api = {},
+              .method = {},
+              .parameters = ReadParameters(request),
+              .cookies = ReadCookies(request),
+              .login = {},
+              .context = binding::RequestContext::Current(),
+              .slots = slots,
+              .slot = slot};
+    call.api = call.Parameter("api").asString();
+    call.version = call.Parameter("version").asInt();
+    call.method = call.Parameter("method").asString();
+    return call;
+}
+
+// Runs the module's function; returns the host's answer, empty when the client has one already.
+std::string RunModule(EntryFunction entry, const Call& call) {
+    VEXO::APIRequest::Context asked{call.parameters, call.cookies, call.method,
+                                    std::string(call.request.Header("REMOTE_ADDR")), call.login};
+    VEXO::APIRequest request(asked);
+    VEXO::APIResponse::Context given;
+    VEXO::APIResponse response(given);
+    entry(&request, &response);
+    std::fflush(stdout);
+    if (call.context.output()->BytesSent() > 0) {
+        return "";
+    }
+    if (given.answer && given.output_enabled) {
+        return http::JsonAnswer(200, *given.answer);
+    }
+    if (call.context.WantsPicture()) {
+        throw Failure(504, "no picture came");
+    }
+    if (!call.login) {
+        throw Failure(401, "no session");
+    }
+    throw Failure(502, "the handler gave no answer");
+}
+
+// Runs the method of our own API; what the store refuses is the caller's fault.
+std::string RunMethod(const OwnApi& api, const Call& call) {
+    const Method& method = api.Find(call.version, call.method);
+    if (method.effect == Method::Effect::kChanges && call.request.Header("REQUEST_METHOD") != "POST") {
+        throw Failure(405, "this method takes POST only");
+    }
+    if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {
+        throw Failure(403, "only those who administer the host may do this");
+    }
+    try {
+        return method.serve(call);
+    } catch (const store::InvalidRecord& error) {
+        throw Failure(400, error.what());
+    } catch (const store::NotFound& error) {
+        throw Failure(404, error.what());
+    } catch (const store::Conflict& error) {
+        throw Failure(409, error.what());
+    }
+}
+
+std::string Serve(const Service& service, const http::Request& request, control::SlotTable& slots,
+                  control::Slot& slot) {
+    CheckOrigin(request);
+    Call call = ReadCall(request, slots, slot);
+    const OwnApi* own = FindOwnApi(call.api);
+    const EntryFunction entry = own == nullptr ? service.modules.Find(call.api, call.version, call.method) : nullptr;
+    if (own == nullptr && entry == nullptr) {
+        throw Failure(404, "no such api, version or method");
+    }
+    if (own == nullptr || own->needs_session) {
+        Admit(call, service.max_requests_per_session);
+    }
+    if (own != nullptr) {
+        return RunMethod(*own, call);
+    }
+    if (call.login && IsPlayer(call)) {
+        PreparePlayer(call);
+    }
+    return RunModule(entry, call);
+}
+
+std::string ServeOrFail(const Service& service, const http::Request& request, control::SlotTable& slots,
+                        control::Slot& slot) {
+    try {
+        return Serve(service, request, slots, slot);
+    } catch (const Failure& failure) {
+        return http::FailureAnswer(failure);
+    } catch (const Json::Exception&) {
+        return http::FailureAnswer(Failure(400, "a parameter has the wrong type"));
+    } catch (const std::exception& error) {
+        base::LogError(std::string("the request failed: ") + error.what());
+    } catch (...) {
+        base::LogError("the request failed: an exception of unknown type");
+    }
+    return http::FailureAnswer(Failure(500, "the handler failed unexpectedly"));
+}
+
+}  // namespace
+
+void ServeRequest(const Service& service, const http::Request& request, control::SlotTable& slots,
+                  control::Slot& slot) {
+    binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.has_ended || slot.player.is_surplus; });
+    LimitAddressSpace(true);
+    slot.pid = ::getpid();
+    binding::RequestEvents events;
+    events.on_stream = [&slot] {
+        slot.is_stream = true;
+        LimitAddressSpace(false);
+    };
+    events.on_player = [&slots, &slot](std::int64_t key) { slots.BeginPlayer(slot, key); };
+    binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
+    const std::string answer = ServeOrFail(service, request, slots, slot);
+    std::fflush(stdout);
+    // What was written before an exception cannot be taken back, and nothing may stand behind it.
+    if (output.BytesSent() == 0) {
+        std::fwrite(answer.data(), 1, answer.size(), stdout);
+        std::fflush(stdout);
+    }
+    // The host has the connection open too; the client should not wait for it.
+    ::shutdown(STDOUT_FILENO, SHUT_WR);
+}
+
+}  // namespace lookhaven::api

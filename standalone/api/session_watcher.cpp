@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/session_watcher.h"
+
+#include <chrono>
+#include <optional>
+#include <thread>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/store/sessions.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::chrono::milliseconds kPeriod{500};
+constexpr std::int64_t kPurgePeriodSeconds = 3600;
+
+void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) {
+    const std::set<std::string> running = slots.Sessions();
+    if (running.empty()) {
+        return;
+    }
+    for (const std::string& ended : store::Sessions(records).EndedAmong({running.begin(), running.end()}, now_s)) {
+        slots.EndSession(ended);
+    }
+}
+
+void Watch(const base::Installation& installation, control::SlotTable& slots) {
+    store::Store records = store::Store::Open(installation.StoreUrl());
+    for (std::int64_t purged_s = 0;; std::this_thread::sleep_for(kPeriod)) {
+        const std::int64_t now_s = base::WallMillis() / 1000;
+        Look(records, slots, now_s);
+        if (now_s - purged_s >= kPurgePeriodSeconds) {
+            store::Sessions(records).PurgeExpired(now_s);
+            purged_s = now_s;
+        }
+    }
+}
+
+}  // namespace
+
+void WatchSessions(const base::Installation& installation, control::SlotTable& slots) {
+    base::SetLogProgram("session-watcher");
+    for (std::string last_problem;;) {
+        try {
+            Watch(installation, slots);
+        } catch (const std::exception& error) {
+            if (last_problem != error.what()) {
+                last_problem = error.what();
+                base::LogError("cannot ask which sessions have ended: " + last_problem);
+            }
+        }
+        std::this_thread::sleep_for(kPeriod);
+    }
+}
+
+}  // namespace lookhaven::api

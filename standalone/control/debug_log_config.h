@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The debug-log configuration that all processes of an installation share: who logs how much.
+//
+// Why so        A running stream must start and stop to log in detail without being touched, so the thresholds stand in
+//               a mapped file (debug-log in the state folder) that each process looks at per line.
+// Invariants    (1) The layout is fixed: the web API module reads it by its own declaration.
+//               (2) A reader never writes; one writer at a time (a lock on the file).
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+
+#include <sys/types.h>
+
+#include "standalone/base/file.h"
+#include "standalone/base/installation.h"
+
+namespace lookhaven::control {
+
+constexpr int kDebugLogCategoryCount = 512;
+constexpr int kDebugLogProcessCount = 256;
+
+struct DebugLogConfig {
+    struct Process {
+        std::int32_t pid;
+        std::int32_t level;
+    };
+
+    std::int32_t version;
+    std::int32_t category_level[kDebugLogCategoryCount];  // lines of a level above it are not written
+    std::int32_t process_count;                           // entries of process in use
+    Process process[kDebugLogProcessCount];
+};
+static_assert(sizeof(DebugLogConfig) == 2056 + 8 * kDebugLogProcessCount);
+
+// Maps the configuration for reading, for as long as the process lives. Null when there is none, or none that this
+// program understands.
+const DebugLogConfig* MapDebugLog(const base::Installation& installation);
+
+// Changes the configuration; made with threshold 1 (errors) for every category where it is missing. Holds the writers'
+// lock for its lifetime. Throws std::system_error when the file cannot be made or mapped.
+class DebugLogEditor {
+  public:
+    explicit DebugLogEditor(const base::Installation& installation);
+
+    const DebugLogConfig& Config() const { return *config_; }
+
+    // Throws std::out_of_range for a category below 0 or above the last.
+    void SetCategory(int category, int level);
+    void SetEveryCategory(int level);
+
+    // Entries of processes that are gone are dropped first. Throws std::length_error when no entry is free.
+    void SetProcess(pid_t pid, int level);
+    // False when the process had no entry.
+    bool RemoveProcess(pid_t pid);
+
+  private:
+    base::FileDescriptor lock_;
+    base::SharedMapping mapping_;
+    DebugLogConfig* config_;
+};
+
+}  // namespace lookhaven::control

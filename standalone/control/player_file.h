@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The file that names the process of a session's newest player. Players write it; the host reads it and sweeps it.
+#pragma once
+
+#include <string_view>
+
+#include <sys/types.h>
+
+namespace lookhaven::control {
+
+// The process that the session's file names; 0 when there is no file, or nothing readable in it. Never waits.
+pid_t ReadPlayerFile(std::string_view session);
+
+// Removes the file when it names the process, which has ended: one that was killed could not.
+void SweepPlayerFile(std::string_view session, pid_t process);
+
+}  // namespace lookhaven::control

@@ -1,0 +1,164 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/control/slot_table.h"
+
+#include <algorithm>
+#include <stdexcept>
+
+#include <sys/eventfd.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::control {
+
+namespace {
+
+bool IsPlayerOf(const Slot& slot, std::string_view session) {
+    return slot.serial != 0 && slot.player.since_us != 0 && SessionOf(slot) == session;
+}
+
+}  // namespace
+
+SlotTable::SlotTable(std::size_t slots) : wake_(::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)) {
+    void* memory = ::mmap(nullptr, slots * sizeof(Slot), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+    if (memory == MAP_FAILED || !wake_) {
+        base::ThrowErrno("cannot make the table of requests");
+    }
+    slots_ = {static_cast<Slot*>(memory), slots};
+    for (Slot& slot : slots_) {
+        new (&slot) Slot{};
+    }
+}
+
+SlotTable::~SlotTable() {
+    ::munmap(slots_.data(), slots_.size_bytes());
+}
+
+Slot* SlotTable::Take() {
+    const auto slot = std::find_if(slots_.begin(), slots_.end(), [](const Slot& each) { return each.serial == 0; });
+    if (slot == slots_.end()) {
+        return nullptr;
+    }
+    slot->is_stream = false;
+    slot->has_session = false;
+    slot->has_ended = false;
+    slot->pid = 0;
+    slot->player.since_us = 0;
+    slot->player.is_surplus = false;
+    slot->player.pause_wanted = false;
+    slot->player.paused = false;
+    slot->player.resumed_rate = 0;
+    slot->serial = ++last_serial_;
+    return &*slot;
+}
+
+void SlotTable::SetSession(Slot& slot, std::string_view handle) {
+    if (handle.size() >= slot.session.size()) {
+        throw std::length_error("a session handle is too long");
+    }
+    slot.session.fill('\0');
+    handle.copy(slot.session.data(), handle.size());
+    slot.has_session = true;
+}
+
+std::size_t SlotTable::OlderOfSession(const Slot& slot) const {
+    return static_cast<std::size_t>(std::count_if(slots_.begin(), slots_.end(), [&](const Slot& each) {
+        const std::uint64_t serial = each.serial;
+        return serial != 0 && serial < slot.serial && SessionOf(each) == SessionOf(slot);
+    }));
+}
+
+std::set<std::string> SlotTable::Sessions() const {
+    std::set<std::string> sessions;
+    for (const Slot& slot : slots_) {
+        if (slot.serial != 0 && slot.has_session && !slot.has_ended) {
+            sessions.emplace(SessionOf(slot));
+        }
+    }
+    return sessions;
+}
+
+void SlotTable::EndSession(std::string_view handle) {
+    for (Slot& slot : slots_) {
+        if (slot.serial != 0 && SessionOf(slot) == handle) {
+            slot.has_ended = true;
+        }
+    }
+    Wake();
+}
+
+void SlotTable::End(Slot& slot) {
+    slot.has_ended = true;
+    Wake();
+}
+
+void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
+    slot.player.key = key;
+    slot.player.since_us = base::MonotonicMicros();
+    Wake();
+}
+
+Slot* SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
+    Slot* found = nullptr;
+    for (Slot& slot : slots_) {
+        if (IsPlayerOf(slot, session) && slot.player.key == key &&
+            (found == nullptr || slot.player.since_us > found->player.since_us)) {
+            found = &slot;
+        }
+    }
+    return found;
+}
+
+std::set<std::string> SlotTable::SessionsWithPlayers() const {
+    std::set<std::string> sessions;
+    for (const Slot& slot : slots_) {
+        if (slot.serial != 0 && slot.player.since_us != 0) {
+            sessions.emplace(SessionOf(slot));
+        }
+    }
+    return sessions;
+}
+
+std::vector<Slot*> SlotTable::SurplusPlayers(std::string_view session, pid_t holder) const {
+    std::vector<Slot*> others;
+    const Slot* owner = nullptr;
+    for (Slot& slot : slots_) {
+        if (slot.serial != 0 && slot.pid == holder && SessionOf(slot) == session) {
+            owner = &slot;
+        } else if (IsPlayerOf(slot, session)) {
+            others.push_back(&slot);
+        }
+    }
+    if (holder <= 0 || owner == nullptr) {
+        return {};
+    }
+    std::sort(others.begin(), others.end(),
+              [](const Slot* left, const Slot* right) { return left->player.since_us > right->player.since_us; });
+    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(owner->player.side_by_side - 1));
+    others.erase(others.begin(), others.begin() + static_cast<std::ptrdiff_t>(staying));
+    return others;
+}
+
+void SlotTable::Wake() {
+    const std::uint64_t one = 1;
+    // A counter that is full wakes the host as well.
+    [[maybe_unused]] const ssize_t written = ::write(wake_.Get(), &one, sizeof one);
+}
+
+void SlotTable::TakeWake() {
+    std::uint64_t count = 0;
+    [[maybe_unused]] const ssize_t got = ::read(wake_.Get(), &count, sizeof count);
+}
+
+void SlotTable::SetWakeDescriptor(int descriptor) {
+    wake_.Release();
+    wake_.Reset(descriptor);
+}
+
+std::string_view SessionOf(const Slot& slot) {
+    return slot.has_session ? std::string_view(slot.session.data()) : std::string_view{};
+}
+
+}  // namespace lookhaven::control

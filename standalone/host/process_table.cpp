@@ -1,0 +1,187 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/host/process_table.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <fstream>
+#include <string>
+
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "standalone/base/log.h"
+#include "standalone/control/player_file.h"
+#include "standalone/control/progress_file.h"
+#include "standalone/host/child.h"
+
+namespace lookhaven::host {
+
+namespace {
+
+constexpr std::chrono::milliseconds kPendingSignal{5};
+
+void Signal(const base::FileDescriptor& pidfd, int number) {
+    ::syscall(SYS_pidfd_send_signal, pidfd.Get(), number, nullptr, 0);
+}
+
+// Two signals of one kind become one while the first has not been taken yet.
+bool IsPending(pid_t pid, int number) {
+    std::ifstream status("/proc/" + std::to_string(pid) + "/status");
+    for (std::string line; std::getline(status, line);) {
+        if (line.starts_with("SigPnd:") || line.starts_with("ShdPnd:")) {
+            const auto set = std::strtoull(line.c_str() + line.find(':') + 1, nullptr, 16);
+            if ((set >> (number - 1) & 1) != 0) {
+                return true;
+            }
+        }
+    }
+    return false;
+}
+
+}  // namespace
+
+std::optional<ProcessTable::Started> ProcessTable::Start(base::FileDescriptor& connection, control::Slot& slot,
+                                                         const std::function<void()>& run) {
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        RunAndExit(run);
+    }
+    base::FileDescriptor pidfd(pid < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, pid, 0)));
+    if (!pidfd) {
+        base::LogError(std::string("cannot start a request process: ") + std::strerror(errno));
+        if (pid > 0) {
+            ::kill(pid, SIGKILL);
+            ::waitpid(pid, nullptr, 0);
+        }
+        return std::nullopt;
+    }
+    const Started started{pid, pidfd.Get()};
+    processes_.insert_or_assign(
+        pid, Process{std::move(connection), std::move(pidfd), &slot, Clock::now(), std::nullopt, {}});
+    return started;
+}
+
+void ProcessTable::HangUp(pid_t pid) {
+    if (const auto found = processes_.find(pid); found != processes_.end()) {
+        BeginLeaving(found->second);
+    }
+}
+
+void ProcessTable::LeaveAll() {
+    for (auto& [pid, process] : processes_) {
+        BeginLeaving(process);
+    }
+}
+
+void ProcessTable::LeaveEnded() {
+    for (auto& [pid, process] : processes_) {
+        if (process.slot->has_ended) {
+            BeginLeaving(process);
+        }
+    }
+}
+
+void ProcessTable::BeginLeaving(Process& process) {
+    if (!process.leaves_since) {
+        process.leaves_since = process.next_signal = Clock::now();
+        process.slot->has_ended = true;
+    }
+}
+
+void ProcessTable::Reap(pid_t pid) {
+    const auto found = processes_.find(pid);
+    int status = 0;
+    if (found == processes_.end() || ::waitpid(pid, &status, WNOHANG) != pid) {
+        return;
+    }
+    if (WIFSIGNALED(status) && WTERMSIG(status) != SIGTERM) {
+        base::LogError("request process " + std::to_string(pid) + " died of signal " +
+                       std::to_string(WTERMSIG(status)));
+    }
+    Sweep(pid, *found->second.slot);
+    control::SlotTable::Free(*found->second.slot);
+    processes_.erase(found);
+}
+
+void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {
+    control::SweepPlayerFile(control::SessionOf(slot), pid);
+    if (slot.player.since_us != 0) {
+        try {
+            control::ProgressFile::Sweep(progress_folder_, slot.player.key, pid);
+        } catch (const std::exception& error) {
+            base::LogError(std::string("cannot sweep a progress file: ") + error.what());
+        }
+    }
+}
+
+bool ProcessTable::SignalSurplus() {
+    bool again = false;
+    for (const std::string& session : slots_.SessionsWithPlayers()) {
+        for (const control::Slot* slot : slots_.SurplusPlayers(session, control::ReadPlayerFile(session))) {
+            if (const auto found = processes_.find(slot->pid); found != processes_.end()) {
+                found->second.slot->player.is_surplus = true;
+                Signal(found->second.pidfd, SIGUSR1);
+                again = true;
+            }
+        }
+    }
+    return again;
+}
+
+bool ProcessTable::SignalPauses() {
+    bool again = false;
+    for (auto& [pid, process] : processes_) {
+        control::Player& player = process.slot->player;
+        if (player.since_us == 0 || player.pause_wanted == player.paused) {
+            continue;
+        }
+        if (IsPending(pid, SIGUSR2)) {
+            again = true;
+            continue;
+        }
+        Signal(process.pidfd, SIGUSR2);
+        player.paused = !player.paused;
+    }
+    return again;
+}
+
+void ProcessTable::SignalPlayers(Clock::time_point now) {
+    if (now < players_due_) {
+        return;
+    }
+    players_due_ = SignalSurplus() ? now + limits_.repeat : Clock::time_point::max();
+    if (SignalPauses()) {
+        players_due_ = now + kPendingSignal;
+    }
+}
+
+Clock::time_point ProcessTable::SendDueSignals(Clock::time_point now) {
+    SignalPlayers(now);
+    Clock::time_point next = players_due_;
+    for (auto& [pid, process] : processes_) {
+        const Clock::time_point answer_due = process.began + limits_.answer;
+        if (!process.leaves_since && !process.slot->is_stream) {
+            if (now < answer_due) {
+                next = std::min(next, answer_due);
+                continue;
+            }
+            base::LogError("request process " + std::to_string(pid) + " has not answered in time");
+            BeginLeaving(process);
+        }
+        if (!process.leaves_since) {
+            continue;
+        }
+        if (now >= process.next_signal) {
+            Signal(process.pidfd, now - *process.leaves_since >= limits_.leave ? SIGKILL : SIGTERM);
+            process.next_signal = now + limits_.repeat;
+        }
+        next = std::min(next, process.next_signal);
+    }
+    return next;
+}
+
+}  // namespace lookhaven::host

@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The request processes that are running, and the road on which each of them leaves.
+//
+// Why so        A module's stream looks at a flag and then waits: a signal between the two goes unseen. So a process that
+//               is to leave gets SIGTERM again and again, and SIGKILL when it does not go.
+// Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
+//               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
+//               (3) A player is asked to look at its player file only while that names another one of its session.
+// Thread safety One thread.
+#pragma once
+
+#include <chrono>
+#include <filesystem>
+#include <functional>
+#include <map>
+#include <optional>
+
+#include <sys/types.h>
+
+#include "standalone/base/file_descriptor.h"
+#include "standalone/control/slot_table.h"
+
+namespace lookhaven::host {
+
+using Clock = std::chrono::steady_clock;
+
+struct ProcessLimits {
+    std::chrono::milliseconds answer{30'000};  // for a request that turns out not to be a stream
+    std::chrono::milliseconds leave{15'000};   // from the first SIGTERM to SIGKILL
+    std::chrono::milliseconds repeat{100};
+};
+
+class ProcessTable {
+  public:
+    // Borrows the slots; progress_folder: where players keep their progress files.
+    ProcessTable(ProcessLimits limits, const control::SlotTable& slots, std::filesystem::path progress_folder)
+        : limits_(limits),
+          slots_(slots),
+          progress_folder_(std::move(progress_folder)) {}
+
+    struct Started {
+        pid_t pid;
+        int pidfd;  // readable once the process has ended; then call Reap
+    };
+    // Forks a process that calls run and ends, and takes the connection. Nothing, and the connection is still the
+    // caller's, when no process can be started. Call it with all signals blocked.
+    std::optional<Started> Start(base::FileDescriptor& connection, control::Slot& slot,
+                                 const std::function<void()>& run);
+
+    // The process's client is gone: tells the process to leave.
+    void HangUp(pid_t pid);
+    void LeaveAll();
+    // Those whose session or player has ended.
+    void LeaveEnded();
+    // Players are to be looked at: one is new, or something is wanted of one.
+    void LookAtPlayers() { players_due_ = Clock::now(); }
+    // Takes in that the process has ended.
+    void Reap(pid_t pid);
+
+    // Sends what is due; returns when to come again.
+    Clock::time_point SendDueSignals(Clock::time_point now);
+
+    bool IsEmpty() const { return processes_.empty(); }
+
+  private:
+    struct Process {
+        base::FileDescriptor connection;
+        base::FileDescriptor pidfd;
+        control::Slot* slot = nullptr;
+        Clock::time_point began;
+        std::optional<Clock::time_point> leaves_since;
+        Clock::time_point next_signal;
+    };
+
+    static void BeginLeaving(Process& process);
+    void Sweep(pid_t pid, const control::Slot& slot) const;
+    void SignalPlayers(Clock::time_point now);
+    bool SignalSurplus();
+    bool SignalPauses();
+
+    ProcessLimits limits_;
+    const control::SlotTable& slots_;
+    std::filesystem::path progress_folder_;
+    Clock::time_point players_due_ = Clock::time_point::max();
+    std::map<pid_t, Process> processes_;
+};
+
+}  // namespace lookhaven::host

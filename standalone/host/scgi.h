@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Takes one SCGI request apart as its bytes arrive.
+//
+// Format        <decimal length>:<name> NUL <value> NUL … ,<body>. The first name is CONTENT_LENGTH, and SCGI is "1".
+// Invariants    (1) Never keeps more than the two limits and one chunk, whatever a client sends.
+//               (2) Complete and malformed are final.
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+#include "standalone/http/request.h"
+
+namespace lookhaven::host {
+
+class ScgiParser {
+  public:
+    enum class State { kIncomplete, kComplete, kMalformed };
+
+    static constexpr std::size_t kMaxHeadBytes = 8 * 1024;
+    static constexpr std::size_t kMaxBodyBytes = 1024 * 1024;
+
+    // Bytes behind the body make a request malformed.
+    State Feed(std::string_view bytes);
+    // What is wrong, for the client; empty unless malformed.
+    std::string_view Problem() const { return problem_; }
+    // The request, once complete; moved out.
+    http::Request TakeRequest() { return std::move(request_); }
+
+  private:
+    enum class Place { kLength, kHead, kBody };
+
+    std::size_t TakeLength(char byte);
+    std::size_t TakeHead(std::string_view bytes);
+    std::size_t TakeBody(std::string_view bytes);
+    void ParseHead();
+    void ParseContentLength();
+    void Fail(std::string_view problem);
+
+    State state_ = State::kIncomplete;
+    Place place_ = Place::kLength;
+    std::size_t head_bytes_ = 0;
+    std::size_t body_bytes_ = 0;
+    std::string head_;
+    http::Request request_;
+    std::string_view problem_;
+};
+
+}  // namespace lookhaven::host

@@ -1,0 +1,254 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/host/server.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <csignal>
+
+#include <sys/epoll.h>
+#include <sys/signalfd.h>
+#include <sys/socket.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "standalone/base/file.h"
+#include "standalone/base/log.h"
+#include "standalone/http/answer.h"
+
+namespace lookhaven::host {
+
+namespace {
+
+constexpr std::chrono::seconds kRefusalLingers{1};
+constexpr std::chrono::seconds kWatcherRestart{1};
+constexpr std::chrono::milliseconds kAcceptAgain{200};
+
+int MillisUntil(Clock::time_point due) {
+    if (due == Clock::time_point::max()) {
+        return -1;
+    }
+    return static_cast<int>(
+        std::max(std::chrono::ceil<std::chrono::milliseconds>(due - Clock::now()), std::chrono::milliseconds{0})
+            .count());
+}
+
+base::FileDescriptor BlockSignals() {
+    sigset_t all;
+    sigfillset(&all);
+    ::sigprocmask(SIG_SETMASK, &all, nullptr);
+    sigset_t ending;
+    sigemptyset(&ending);
+    sigaddset(&ending, SIGTERM);
+    sigaddset(&ending, SIGINT);
+    return base::FileDescriptor(::signalfd(-1, &ending, SFD_CLOEXEC | SFD_NONBLOCK));
+}
+
+}  // namespace
+
+Server::Server(const base::Installation& installation, ChildWork work, base::FileDescriptor listener,
+               const ServerLimits& limits)
+    : work_(std::move(work)),
+      limits_(limits),
+      slots_(limits.requests),
+      processes_(limits.processes, slots_, installation.ProgressFolder()),
+      listener_(std::move(listener)),
+      poll_(::epoll_create1(EPOLL_CLOEXEC)),
+      signals_(BlockSignals()) {
+    if (!poll_ || !signals_) {
+        base::ThrowErrno("cannot set up the host");
+    }
+    // What the players of a host that was killed have left.
+    std::filesystem::remove_all(installation.ProgressFolder());
+    Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
+    Watch(signals_.Get(), Kind::kSignals, 0, EPOLLIN);
+    Watch(slots_.WakeDescriptor(), Kind::kWake, 0, EPOLLIN);
+}
+
+void Server::Run() {
+    std::array<epoll_event, 64> events{};
+    while (!ending_ || !processes_.IsEmpty()) {
+        const int timeout = MillisUntil(DoWhatIsDue());
+        const int ready = ::epoll_wait(poll_.Get(), events.data(), static_cast<int>(events.size()), timeout);
+        for (int i = 0; i < ready; ++i) {
+            const std::uint64_t tag = events[static_cast<std::size_t>(i)].data.u64;
+            Handle(static_cast<Kind>(tag >> 32), static_cast<std::uint32_t>(tag));
+        }
+    }
+    EndWatcher();
+}
+
+void Server::Watch(int descriptor, Kind kind, std::uint32_t id, std::uint32_t events) {
+    epoll_event event{};
+    event.events = events;
+    event.data.u64 = (std::uint64_t{static_cast<std::uint32_t>(kind)} << 32) | id;
+    if (::epoll_ctl(poll_.Get(), EPOLL_CTL_ADD, descriptor, &event) != 0 &&
+        ::epoll_ctl(poll_.Get(), EPOLL_CTL_MOD, descriptor, &event) != 0) {
+        base::ThrowErrno("cannot watch a descriptor");
+    }
+}
+
+void Server::Handle(Kind kind, std::uint32_t id) {
+    switch (kind) {
+    case Kind::kListener:
+        return Accept();
+    case Kind::kSignals:
+        return BeginShutdown();
+    case Kind::kWake:
+        slots_.TakeWake();
+        processes_.LookAtPlayers();
+        return processes_.LeaveEnded();
+    case Kind::kWatcher:
+        base::LogWarning("the session watcher has ended");
+        EndWatcher();
+        watcher_due_ = Clock::now() + kWatcherRestart;
+        return;
+    case Kind::kConnection:
+        return Read(static_cast<int>(id));
+    case Kind::kHangUp:
+        return processes_.HangUp(static_cast<pid_t>(id));
+    case Kind::kProcess:
+        return processes_.Reap(static_cast<pid_t>(id));
+    }
+}
+
+void Server::Accept() {
+    // Not set non-blocking: the request process gets this very socket. Reading here never waits by MSG_DONTWAIT.
+    base::FileDescriptor socket(::accept4(listener_.Get(), nullptr, nullptr, SOCK_CLOEXEC));
+    if (!socket) {
+        if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == ENOBUFS) {
+            base::LogError("cannot take a connection in: too little memory or too many files are open");
+            Watch(listener_.Get(), Kind::kListener, 0, 0);
+            accept_due_ = Clock::now() + kAcceptAgain;
+        }
+        return;
+    }
+    const int number = socket.Get();
+    Connection& connection = connections_[number];
+    connection = {std::move(socket), {}, Clock::now() + limits_.read, false};
+    Watch(number, Kind::kConnection, static_cast<std::uint32_t>(number), EPOLLIN);
+    if (connections_.size() > limits_.requests) {
+        Refuse(connection, 503, "too many requests are waiting");
+    }
+}
+
+void Server::Read(int socket) {
+    const auto found = connections_.find(socket);
+    if (found == connections_.end()) {
+        return;
+    }
+    Connection& connection = found->second;
+    std::array<char, 16 * 1024> bytes;
+    const ssize_t got = ::recv(socket, bytes.data(), bytes.size(), MSG_DONTWAIT);
+    if (got < 0 && (errno == EAGAIN || errno == EINTR)) {
+        return;
+    }
+    if (got <= 0) {
+        connections_.erase(found);
+    } else if (!connection.refused) {
+        switch (connection.parser.Feed({bytes.data(), static_cast<std::size_t>(got)})) {
+        case ScgiParser::State::kIncomplete:
+            return;
+        case ScgiParser::State::kMalformed:
+            return Refuse(connection, 400, std::string(connection.parser.Problem()));
+        case ScgiParser::State::kComplete:
+            Connection complete = std::move(connection);
+            connections_.erase(found);
+            return StartRequest(std::move(complete));
+        }
+    }
+}
+
+// The connection stays open for a moment and its further bytes are dropped: closing at once would reset it, and the
+// client might lose the answer.
+void Server::Refuse(Connection& connection, int status, const std::string& message) {
+    const std::string answer = http::FailureAnswer(http::Failure(status, message));
+    ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
+    ::shutdown(connection.socket.Get(), SHUT_WR);
+    connection.refused = true;
+    connection.until = Clock::now() + kRefusalLingers;
+}
+
+void Server::StartRequest(Connection connection) {
+    const int number = connection.socket.Get();
+    control::Slot* slot = slots_.Take();
+    if (slot == nullptr) {
+        return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
+    }
+    const http::Request request = connection.parser.TakeRequest();
+    const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {
+        LeaveHost(host, slots_, number);
+        work_.serve_request(request, slots_, *slot);
+    });
+    if (!process) {
+        control::SlotTable::Free(*slot);
+        return Refuse(connections_[number] = std::move(connection), 503, "cannot start a request process");
+    }
+    Watch(process->pidfd, Kind::kProcess, static_cast<std::uint32_t>(process->pid), EPOLLIN);
+    // Once: the connection stays open, and hung up, until the process is gone.
+    Watch(number, Kind::kHangUp, static_cast<std::uint32_t>(process->pid), EPOLLONESHOT);
+}
+
+void Server::StartWatcher() {
+    watcher_due_ = Clock::time_point::max();
+    const pid_t host = ::getpid();
+    watcher_pid_ = ::fork();
+    if (watcher_pid_ == 0) {
+        RunAndExit([&] {
+            LeaveHost(host, slots_, -1);
+            work_.watch_sessions(slots_);
+        });
+    }
+    watcher_.Reset(watcher_pid_ < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, watcher_pid_, 0)));
+    if (!watcher_) {
+        base::LogError("cannot start the session watcher");
+        watcher_due_ = Clock::now() + kWatcherRestart;
+        return;
+    }
+    Watch(watcher_.Get(), Kind::kWatcher, 0, EPOLLIN);
+}
+
+void Server::EndWatcher() {
+    if (watcher_pid_ > 0) {
+        ::kill(watcher_pid_, SIGKILL);
+        ::waitpid(watcher_pid_, nullptr, 0);
+    }
+    watcher_pid_ = 0;
+    watcher_.Reset();
+}
+
+void Server::BeginShutdown() {
+    signalfd_siginfo signal{};
+    [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
+    ending_ = true;
+    listener_.Reset();
+    connections_.clear();
+    processes_.LeaveAll();
+}
+
+Clock::time_point Server::DoWhatIsDue() {
+    const Clock::time_point now = Clock::now();
+    if (now >= watcher_due_ && !ending_) {
+        StartWatcher();
+    }
+    if (now >= accept_due_ && !ending_) {
+        Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
+        accept_due_ = Clock::time_point::max();
+    }
+    Clock::time_point next = std::min({processes_.SendDueSignals(now), watcher_due_, accept_due_});
+    for (auto at = connections_.begin(); at != connections_.end();) {
+        Connection& connection = at->second;
+        if (now >= connection.until && !connection.refused) {
+            Refuse(connection, 408, "the request did not arrive in time");
+        }
+        if (now >= connection.until) {
+            at = connections_.erase(at);
+            continue;
+        }
+        next = std::min(next, connection.until);
+        ++at;
+    }
+    return next;
+}
+
+}  // namespace lookhaven::host

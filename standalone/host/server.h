@@ -1,0 +1,78 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The host's loop: takes requests in, starts a process for each, watches connections and processes.
+//
+// Invariants    (1) Nothing here waits for a client or a process.
+//               (2) The store, a ring or libav is never opened in this process: a fork would break it.
+// Thread safety One thread, and no other in the process.
+#pragma once
+
+#include <array>
+#include <chrono>
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "standalone/base/file_descriptor.h"
+#include "standalone/base/installation.h"
+#include "standalone/control/slot_table.h"
+#include "standalone/host/child.h"
+#include "standalone/host/process_table.h"
+#include "standalone/host/scgi.h"
+
+namespace lookhaven::host {
+
+struct ServerLimits {
+    std::size_t requests = 256;              // running at once
+    std::chrono::milliseconds read{10'000};  // from accepting a connection to the request's last byte
+    ProcessLimits processes;
+};
+
+class Server {
+  public:
+    // The listener is a listening stream socket. Removes what players of a killed host left in the installation's folder
+    // of progress files. Blocks all signals of the process. Throws std::system_error.
+    Server(const base::Installation& installation, ChildWork work, base::FileDescriptor listener,
+           const ServerLimits& limits);
+
+    // Serves until SIGTERM or SIGINT, then ends the request processes and returns when the last is gone.
+    void Run();
+
+  private:
+    enum class Kind : std::uint32_t { kListener, kSignals, kWake, kWatcher, kConnection, kHangUp, kProcess };
+
+    // A connection whose request has not been read to its end, or whose refusal has not been read.
+    struct Connection {
+        base::FileDescriptor socket;
+        ScgiParser parser;
+        Clock::time_point until;
+        bool refused = false;
+    };
+
+    void Watch(int descriptor, Kind kind, std::uint32_t id, std::uint32_t events);
+    void Handle(Kind kind, std::uint32_t id);
+    void Accept();
+    void Read(int socket);
+    void Refuse(Connection& connection, int status, const std::string& message);
+    void StartRequest(Connection connection);
+    void StartWatcher();
+    void BeginShutdown();
+    void EndWatcher();
+    Clock::time_point DoWhatIsDue();
+
+    const ChildWork work_;
+    ServerLimits limits_;
+    control::SlotTable slots_;
+    ProcessTable processes_;
+    std::map<int, Connection> connections_;
+    base::FileDescriptor listener_;
+    base::FileDescriptor poll_;
+    base::FileDescriptor signals_;
+    base::FileDescriptor watcher_;  // pidfd
+    pid_t watcher_pid_ = 0;
+    Clock::time_point watcher_due_ = Clock::time_point::min();  // when to start it
+    Clock::time_point accept_due_ = Clock::time_point::max();   // when to listen again
+    bool ending_ = false;
+};
+
+}  // namespace lookhaven::host

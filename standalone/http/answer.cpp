@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/http/answer.h"
+
+#include <array>
+#include <utility>
+
+#include <json/json.h>
+
+namespace lookhaven::http {
+
+namespace {
+
+const char* Reason(int status) {
+    constexpr std::array<std::pair<int, const char*>, 13> kReasons{{{200, "OK"},
+                                                                    {400, "Bad Request"},
+                                                                    {401, "Unauthorized"},
+                                                                    {403, "Forbidden"},
+                                                                    {404, "Not Found"},
+                                                                    {405, "Method Not Allowed"},
+                                                                    {408, "Request Timeout"},
+                                                                    {409, "Conflict"},
+                                                                    {429, "Too Many Requests"},
+                                                                    {500, "Internal Server Error"},
+                                                                    {502, "Bad Gateway"},
+                                                                    {503, "Service Unavailable"},
+                                                                    {504, "Gateway Timeout"}}};
+    for (const auto& [number, reason] : kReasons) {
+        if (number == status) {
+            return reason;
+        }
+    }
+    return "Error";
+}
+
+}  // namespace
+
+std::string JsonAnswer(int status, const std::string& body, const std::string& extra) {
+    return "Status: " + std::to_string(status) + ' ' + Reason(status) +
+           "\r\nContent-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
+           std::to_string(body.size()) + "\r\n" + extra + "\r\n" + body;
+}
+
+std::string FailureAnswer(const Failure& failure) {
+    return JsonAnswer(failure.Status(), R"({"error":{"code":)" + std::to_string(failure.Status()) +
+                                            R"(,"data":null,"message":)" + Json::valueToQuotedString(failure.what()) +
+                                            R"(},"success":false})");
+}
+
+}  // namespace lookhaven::http

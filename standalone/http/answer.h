@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// JSON answers with their head lines, and the failures that the host itself reports.
+#pragma once
+
+#include <stdexcept>
+#include <string>
+
+namespace lookhaven::http {
+
+// A failure that the client is told: HTTP status, which is the answer's code too, and a message without secrets.
+class Failure : public std::runtime_error {
+  public:
+    Failure(int status, const std::string& message) : std::runtime_error(message), status_(status) {}
+    int Status() const { return status_; }
+
+  private:
+    int status_;
+};
+
+// The whole answer with a body of JSON. extra: further head lines, each ending in CR LF.
+std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
+
+// {"success": false, "error": {"code": status, "data": null, "message": …}}
+std::string FailureAnswer(const Failure& failure);
+
+}  // namespace lookhaven::http

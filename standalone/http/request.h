@@ -1,0 +1,21 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One HTTP request as the web server hands it on.
+#pragma once
+
+#include <map>
+#include <string>
+#include <string_view>
+
+namespace lookhaven::http {
+
+struct Request {
+    // By their CGI names: REQUEST_METHOD, QUERY_STRING, HTTP_COOKIE …
+    std::map<std::string, std::string, std::less<>> headers;
+    std::string body;
+
+    // The header's value, borrowed from the request; empty when it is missing.
+    std::string_view Header(std::string_view name) const;
+};
+
+}  // namespace lookhaven::http

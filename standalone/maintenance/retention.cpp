@@ -1,0 +1,161 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/maintenance/retention.h"
+
+#include <algorithm>
+#include <array>
+#include <vector>
+
+#include "standalone/archive/recording_log.h"
+#include "standalone/base/log.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+
+namespace lookhaven::maintenance {
+
+namespace {
+
+constexpr int kEventsAtOnce = 100;
+constexpr int kMarksAtOnce = 100;
+
+class Retention {
+  public:
+    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s)
+        : mount_(mount),
+          folder_(folder),
+          events_(store),
+          marks_(store),
+          mounts_(store),
+          now_s_(now_s) {}
+
+    Removed Run() {
+        excess_bytes_ = Excess();
+        for (bool goes_on = true; goes_on;) {
+            const std::vector<store::Event> oldest = events_.Oldest(mount_.id, kEventsAtOnce);
+            const int before = removed_.events;
+            for (const store::Event& event : oldest) {
+                if (!MustGo(event)) {
+                    return removed_;
+                }
+                RemoveEvent(event);
+            }
+            goes_on = oldest.size() == kEventsAtOnce && removed_.events > before;
+        }
+        return removed_;
+    }
+
+  private:
+    // Bytes that have to go whatever their age.
+    std::int64_t Excess() {
+        std::int64_t excess = 0;
+        if (mount_.max_bytes > 0) {
+            excess = events_.Content(mount_.id).size_bytes - mount_.max_bytes;
+        }
+        const MountSpace space = folder_.Space();
+        if (space.free_bytes < 2 * space.ReserveBytes()) {
+            excess = std::max(excess, 3 * space.ReserveBytes() - space.free_bytes);
+        }
+        return excess;
+    }
+
+    bool MustGo(const store::Event& event) const {
+        return removed_.bytes < excess_bytes_ || (mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s);
+    }
+
+    void RemoveEvent(const store::Event& event) {
+        const std::optional<archive::FileName> name = archive::ParsePath(event.path);
+        events_.Remove(std::array{event.id});
+        ++removed_.events;
+        removed_.bytes += event.size_bytes;
+        if (!name || name->kind != archive::FileKind::kRecording) {
+            base::LogWarning("the path of event " + std::to_string(event.id) + " names no recording: left alone");
+            return;
+        }
+        folder_.Remove(*name);
+        RemoveMarks(event);
+        Forget(event);
+        if (archive::DayOf(event.start_s) < archive::DayOf(now_s_)) {
+            folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
+        }
+    }
+
+    bool HasFootage(int camera, std::int64_t begin_s, std::int64_t end_s) {
+        store::EventFilter filter;
+        filter.camera_ids = {camera};
+        filter.begin_s = begin_s;
+        filter.end_s = std::max(end_s, begin_s + 1);
+        filter.limit = 1;
+        return !events_.List(filter).empty();
+    }
+
+    void RemoveMarks(const store::Event& event) {
+        for (const store::Mark& mark : marks_.EndedBy(event.camera_id, event.end_s, kMarksAtOnce)) {
+            if (HasFootage(event.camera_id, mark.start_s, mark.end_s)) {
+                continue;
+            }
+            if (RemoveSpan(mark)) {
+                marks_.Remove(mark.id);
+                ++removed_.marks;
+            }
+        }
+    }
+
+    // False while the mount that holds the span file is not there. The row may go after the file here: a mark without
+    // footage has nothing to show either way.
+    bool RemoveSpan(const store::Mark& mark) {
+        const std::optional<archive::FileName> name = archive::ParsePath(mark.path);
+        if (mark.state != store::MarkState::kSaved || !name || name->kind != archive::FileKind::kSpan) {
+            return true;
+        }
+        if (mark.mount_id == mount_.id) {
+            folder_.Remove(*name);
+            return true;
+        }
+        const std::optional<store::Mount> other = mounts_.Find(mark.mount_id);
+        const std::optional<MountFolder> folder =
+            other ? MountFolder::Open(other->path, other->id) : std::optional<MountFolder>();
+        if (folder) {
+            folder->Remove(*name);
+        }
+        return folder.has_value();
+    }
+
+    // The recording log says what can be played; a second that the next event shares stays.
+    void Forget(const store::Event& event) {
+        const std::filesystem::path camera = folder_.Path() / std::to_string(event.camera_id);
+        std::int64_t end_s = event.end_s;
+        while (end_s > event.start_s && HasFootage(event.camera_id, end_s - 1, end_s)) {
+            --end_s;
+        }
+        std::int64_t begin_s = event.start_s;
+        while (begin_s < end_s && HasFootage(event.camera_id, begin_s, begin_s + 1)) {
+            ++begin_s;
+        }
+        if (begin_s >= end_s || !folder_.HasDay(event.camera_id, begin_s)) {
+            return;
+        }
+        try {
+            archive::WriteRecordingLog(camera, begin_s, end_s, 0);
+        } catch (const std::system_error& failure) {
+            base::LogWarning(std::string("the recording log keeps what is gone: ") + failure.what());
+        }
+    }
+
+    const store::Mount& mount_;
+    const MountFolder& folder_;
+    store::Events events_;
+    store::Marks marks_;
+    store::Mounts mounts_;
+    const std::int64_t now_s_;
+    std::int64_t excess_bytes_ = 0;
+    Removed removed_;
+};
+
+}  // namespace
+
+Removed Retain(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
+    const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
+    return folder ? Retention(store, mount, *folder, now_s).Run() : Removed{};
+}
+
+}  // namespace lookhaven::maintenance

@@ -1,0 +1,108 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/maintenance/salvage.h"
+
+#include <algorithm>
+#include <array>
+
+#include <fcntl.h>
+
+#include "standalone/archive/matroska_blocks.h"
+#include "standalone/base/file.h"
+
+namespace lookhaven::maintenance {
+
+namespace {
+
+store::VideoType TypeOf(const std::string& codec) {
+    return codec == "H264"   ? store::VideoType::kH264
+           : codec == "H265" ? store::VideoType::kH265
+                             : store::VideoType::kMjpeg;
+}
+
+// A whole second at least, for an event that takes no time touches no span of time.
+std::int64_t EndOf(std::int64_t start_s, std::int64_t duration_ms) {
+    const std::int64_t seconds = std::clamp<std::int64_t>((duration_ms + 999) / 1000, 1, store::kMaxEventSeconds);
+    return start_s + seconds;
+}
+
+// Nobody else's file looks like this: empty, or with our head and no frame behind it.
+bool IsBarelyBegun(const std::filesystem::path& recording) {
+    if (std::filesystem::file_size(recording) == 0) {
+        return true;
+    }
+    try {
+        const base::FileDescriptor file = base::OpenFile(recording, O_RDONLY | O_NOFOLLOW);
+        std::vector<archive::FrameEntry> frames;
+        archive::MatroskaBlocks blocks(file.Get());
+        return !blocks.ReadCluster(frames);
+    } catch (const archive::ArchiveError&) {
+        return false;
+    }
+}
+
+// A file without a frame goes where it is ours without doubt.
+Sentence Discard(const MountFolder& mount, const archive::FileName& name) {
+    const std::string path = (mount.Path() / archive::PathOf(name)).string();
+    if (!IsBarelyBegun(path)) {
+        return "left " + path + " alone: it holds nothing that could be a recording of ours";
+    }
+    mount.Remove(name);
+    return "removed " + path + ", which holds no frame";
+}
+
+}  // namespace
+
+store::Event RowOf(const archive::FileName& name, int mount_id, const archive::Contents& contents) {
+    const archive::IndexHeader& header = contents.header;
+    store::Event row;
+    row.id = name.event;
+    row.camera_id = name.camera;
+    row.mount_id = mount_id;
+    row.start_s = name.start_s;
+    row.end_s = EndOf(name.start_s, contents.duration_ms);
+    row.reason = header.reason == store::kReasonAlarm ? store::kReasonAlarm : store::kReasonContinuous;
+    row.frame_count = contents.frame_count;
+    row.size_bytes = static_cast<std::int64_t>(contents.size_bytes);
+    row.video_type = TypeOf(header.codec);
+    row.audio_codec = header.audio_codec;
+    row.width = header.width;
+    row.height = header.height;
+    row.path = archive::PathOf(name);
+    return row;
+}
+
+Sentence CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row) {
+    const std::filesystem::path path = mount.Path() / row.path;
+    const std::optional<archive::FileName> name = archive::ParsePath(row.path);
+    if (!name || !mount.Has(*name)) {
+        events.Remove(std::array{row.id});
+        return "removed event " + std::to_string(row.id) + ", whose file " + path.string() + " is gone";
+    }
+    const archive::Contents contents = archive::CloseCrashed(path);
+    if (contents.frame_count == 0) {
+        events.Remove(std::array{row.id});
+        return Discard(mount, *name);
+    }
+    const store::Event whole = RowOf(*name, row.mount_id, contents);
+    events.Finish(row.id, whole.end_s, whole.frame_count, whole.size_bytes);
+    return "closed " + path.string() + " behind its last good frame";
+}
+
+Sentence AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
+                        int known_id) {
+    const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
+    if (contents.frame_count == 0) {
+        return Discard(mount, name);
+    }
+    archive::FileName kept = name;
+    if (name.event > known_id) {
+        kept.event = events.NextId();
+        if (!mount.Renumber(name, kept.event)) {
+            return "left " + archive::PathOf(name) + " alone: the name of its new number is taken";
+        }
+    }
+    events.Begin(RowOf(kept, mount_id, contents));
+    return "took in " + (mount.Path() / archive::PathOf(kept)).string();
+}
+
+}  // namespace lookhaven::maintenance

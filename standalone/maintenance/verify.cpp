@@ -1,0 +1,291 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/maintenance/verify.h"
+
+#include <algorithm>
+#include <array>
+#include <limits>
+#include <map>
+#include <set>
+#include <unordered_map>
+
+#include <fcntl.h>
+
+#include "standalone/archive/frame_index.h"
+#include "standalone/archive/matroska_blocks.h"
+#include "standalone/archive/span_file.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/salvage.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::maintenance {
+
+namespace {
+
+// A recorder's new file has its index and its row well within this.
+constexpr std::int64_t kFreshS = 10;
+
+using Frames = std::vector<archive::FrameEntry>;
+
+// How a recording and its index stand to each other.
+struct Inspection {
+    std::string problem;  // empty when they agree
+    bool is_growing = false;
+    bool must_be_rebuilt = false;  // the index says it is whole, and is wrong
+    bool is_lost_within = false;   // the recording is damaged in the middle; what the index names is still there
+    std::int64_t frames = 0;
+};
+
+Frames WalkRecording(const std::filesystem::path& path) {
+    const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW);
+    Frames frames;
+    archive::MatroskaBlocks blocks(file.Get());
+    while (blocks.ReadCluster(frames)) {
+    }
+    frames.erase(frames.begin(), std::ranges::find_if(frames, &archive::FrameEntry::key));
+    return frames;
+}
+
+Inspection Inspect(const std::filesystem::path& path) {
+    Inspection result;
+    Frames indexed;
+    try {
+        archive::FrameIndexReader index(archive::IndexPathOf(path));
+        result.is_growing = index.IsGrowing();
+        if (result.is_growing) {
+            return result;
+        }
+        index.ReadNew(std::filesystem::file_size(path), indexed);
+        if (!index.IsFinished()) {
+            result.problem = "the recording " + path.string() + " was never closed";
+            return result;
+        }
+    } catch (const std::exception& failure) {
+        result.problem = std::string("an index cannot be used: ") + failure.what();
+        result.must_be_rebuilt = true;
+        return result;
+    }
+    result.frames = static_cast<std::int64_t>(indexed.size());
+    Frames found;
+    try {
+        found = WalkRecording(path);
+    } catch (const archive::ArchiveError& failure) {
+        result.problem = "the recording " + path.string() + " cannot be read: " + failure.what();
+    }
+    if (found == indexed && result.problem.empty()) {
+        return result;
+    }
+    result.is_lost_within = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());
+    result.must_be_rebuilt = !result.is_lost_within;
+    if (result.problem.empty()) {
+        result.problem = result.is_lost_within ? "the recording " + path.string() + " is damaged behind frame " +
+                                                     std::to_string(found.size())
+                                               : "the index of " + path.string() + " does not name its frames";
+    }
+    return result;
+}
+
+class Verification {
+  public:
+    Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress)
+        : store_(store),
+          events_(store),
+          repair_(repair),
+          progress_(progress),
+          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
+
+    VerifyReport Run() {
+        std::set<int> mounts;
+        for (const store::Mount& mount : store::Mounts(store_).List()) {
+            mounts.insert(mount.id);
+            CheckMount(mount);
+        }
+        return std::move(report_);
+    }
+
+  private:
+    void CheckMount(const store::Mount& mount) {
+        std::vector<store::Event> rows;
+        events_.VisitMount(mount.id, [&](const store::Event& event) { rows.push_back(event); });
+        std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
+        if (!folder && rows.empty() && MountFolder::IsUnmarked(mount.path)) {
+            return;  // nothing was recorded yet
+        }
+        if (!folder) {
+            report_.faults.push_back({"mount " + std::to_string(mount.id) + " at " + mount.path +
+                                          " is not there, with " + std::to_string(rows.size()) + " events",
+                                      ""});
+            return;
+        }
+        for (std::size_t i = 0; i < rows.size(); ++i) {
+            Try([&] { CheckRow(*folder, rows[i]); });
+            if (progress_) {
+                progress_(i + 1, rows.size());
+            }
+        }
+        report_.events += static_cast<std::int64_t>(rows.size());
+        CheckMarks(*folder, mount.id);
+        CheckFiles(*folder, mount.id, rows);
+    }
+
+    template <class Work>
+    void Try(Work&& work) {
+        try {
+            work();
+        } catch (const store::StoreError&) {
+            throw;
+        } catch (const std::exception& failure) {
+            report_.faults.push_back({failure.what(), ""});
+        }
+    }
+
+    template <class Repair>
+    void Report(const std::string& problem, Repair&& repair) {
+        report_.faults.push_back({problem, ""});
+        if (repair_) {
+            report_.faults.back().done = repair();
+        }
+    }
+
+    void CheckRow(const MountFolder& mount, const store::Event& row) {
+        const std::string path = (mount.Path() / row.path).string();
+        const std::optional<archive::FileName> name = archive::ParsePath(row.path);
+        if (!name || name->event != row.id || name->kind != archive::FileKind::kRecording) {
+            Report("the path of event " + std::to_string(row.id) + " names no recording of its own: " + row.path,
+                   [&] { return events_.Remove(std::array{row.id}) > 0 ? "removed the event" : ""; });
+            return;
+        }
+        if (!mount.Has(*name)) {
+            // Retention may have been quicker.
+            if (events_.Find(row.id)) {
+                Report("event " + std::to_string(row.id) + " has no file: " + path,
+                       [&] { return CloseEvent(events_, mount, row); });
+            }
+            return;
+        }
+        const Inspection found = Inspect(path);
+        report_.frames += found.frames;
+        if (found.is_growing) {
+            return;
+        }
+        if (!found.problem.empty()) {
+            Report(found.problem, [&] { return Mend(mount, row, found); });
+        } else if (row.recording || row.frame_count != found.frames) {
+            CheckProgress(mount, row);
+        }
+    }
+
+    // The row may have gone on since it was read.
+    void CheckProgress(const MountFolder& mount, const store::Event& before) {
+        const std::optional<store::Event> row = events_.Find(before.id);
+        const Inspection found = Inspect(mount.Path() / before.path);
+        if (row && !found.is_growing && (row->recording || row->frame_count != found.frames)) {
+            Report("the row of event " + std::to_string(row->id) + " does not say what its file holds",
+                   [&] { return CloseEvent(events_, mount, *row); });
+        }
+    }
+
+    std::string Mend(const MountFolder& mount, const store::Event& row, const Inspection& found) {
+        if (found.is_lost_within) {
+            return "";
+        }
+        if (found.must_be_rebuilt) {
+            RemoveIndex(mount, *archive::ParsePath(row.path));
+        }
+        return CloseEvent(events_, mount, row);
+    }
+
+    static void RemoveIndex(const MountFolder& mount, archive::FileName name) {
+        name.kind = archive::FileKind::kIndex;
+        mount.Remove(name);
+    }
+
+    void CheckMarks(const MountFolder& mount, int mount_id) {
+        for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
+            Try([&] {
+                try {
+                    archive::ReadSpan(mount.Path() / mark.path);
+                } catch (const std::exception& failure) {
+                    Report("the span of mark " + std::to_string(mark.id) + " cannot be read: " + failure.what(),
+                           [&] { return SaveMark(store_, mark) ? "written anew" : ""; });
+                }
+            });
+        }
+    }
+
+    void CheckFiles(const MountFolder& mount, int mount_id, const std::vector<store::Event>& rows) {
+        std::set<std::string> expected;
+        for (const store::Event& row : rows) {
+            expected.insert(row.path);
+        }
+        for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
+            expected.insert(mark.path);
+        }
+        const std::int64_t fresh_s = base::WallMillis() / 1000 - kFreshS;
+        for (const MountFolder::File& file : mount.Files()) {
+            if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < fresh_s) {
+                Try([&] { CheckStray(mount, mount_id, file.name, rows.empty()); });
+            }
+        }
+    }
+
+    void CheckStray(const MountFolder& mount, int mount_id, const archive::FileName& name, bool store_is_empty) {
+        const std::string path = (mount.Path() / archive::PathOf(name)).string();
+        archive::FileName recording = name;
+        recording.kind = archive::FileKind::kRecording;
+        switch (name.kind) {
+        case archive::FileKind::kRecording:
+            if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
+                Report("no event has the file " + path,
+                       [&] { return AdoptRecording(events_, mount, mount_id, name, known_id_); });
+            }
+            break;
+        case archive::FileKind::kIndex:
+            if (mount.Has(name) && !mount.Has(recording)) {
+                Report("there is no recording to the index " + path,
+                       [&] { return RemoveStray(mount, name, store_is_empty); });
+            }
+            break;
+        case archive::FileKind::kSpan:
+            if (mount.Has(name) && !HasMark(name.event)) {
+                Report("no mark has the span " + path, [&] { return RemoveStray(mount, name, store_is_empty); });
+            }
+            break;
+        }
+    }
+
+    // An event that was begun after the rows were read.
+    bool HasRow(const archive::FileName& name) {
+        const std::optional<store::Event> row = events_.Find(name.event);
+        return row && row->path == archive::PathOf(name);
+    }
+
+    bool HasMark(int id) {
+        store::Marks marks(store_);
+        return marks.Find(store::MarkKind::kAlert, id) || marks.Find(store::MarkKind::kPos, id);
+    }
+
+    // Only what this store gave a number to is known to be of no use.
+    std::string RemoveStray(const MountFolder& mount, const archive::FileName& name, bool store_is_empty) const {
+        if (store_is_empty || name.event > known_id_) {
+            return "";
+        }
+        return mount.Remove(name) ? "removed" : "";
+    }
+
+    store::Store& store_;
+    store::Events events_;
+    const bool repair_;
+    const std::function<void(std::size_t, std::size_t)>& progress_;
+    const int known_id_;
+    VerifyReport report_;
+};
+
+}  // namespace
+
+VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress) {
+    return Verification(store, repair, progress).Run();
+}
+
+}  // namespace lookhaven::maintenance

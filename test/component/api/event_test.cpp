@@ -1,0 +1,173 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Event and VEXO.Catalog: what can be marked, listed and found, by whom, and what bad input gets.
+#include <fstream>
+#include <set>
+
+#include <gtest/gtest.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/marks.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/users.h"
+#include "test/support/footage/footage.h"
+#include "test/support/host/host_under_test.h"
+
+namespace lookhaven::api {
+namespace {
+
+class EventApi : public testing::Test {
+  protected:
+    Answer Ask(const std::string& query, const std::string& form = "", bool as_viewer = false) const {
+        return host_.Ask("api=VEXO." + query, as_viewer ? viewer_ : admin_, {}, form);
+    }
+
+    HostUnderTest host_;
+    std::filesystem::path folder_ = host_.Home().Home();
+    test::Footage footage_{host_.Home().StoreUrl(), folder_};
+    std::string admin_ = host_.LogIn().secret;
+    // May play back camera 1 alone. Taking a right away ends the sessions that were there, so logs in afterwards.
+    std::string viewer_ =
+        (store::Users(footage_.Records()).Deny(2, 2),
+         store::Users(footage_.Records()).Deny(2, 3, {store::CameraAccess::kPlayback}), host_.LogIn("guest").secret);
+};
+
+TEST_F(EventApi, MarksAndListsWhatHappened) {
+    const std::string mark = "Event&version=1&method=Mark";
+    const Json::Value sale =
+        Ask(mark, "kind=pos&camera=1&start=1000000&length=20&text=1+Coffee%0A2+Tea").Json()["data"];
+    EXPECT_EQ(sale["kind"], "pos");
+    EXPECT_EQ(sale["state"], "pending");
+    EXPECT_LE(sale["start"].asInt(), 1000000);
+    EXPECT_GE(sale["stop"].asInt(), 1000020);
+    const Answer lines = host_.Ask("api=VEXO." + mark, admin_, {{"CONTENT_TYPE", "application/json"}},
+                                   R"({"kind": "alert", "camera": 2, "start": 2000000, "text": ["door", "opened"]})");
+    EXPECT_EQ(lines.Json()["data"]["text"][1], "opened");
+    EXPECT_EQ(Ask(mark, "kind=alert&camera=1", true).status, 200) << "now, for a moment";
+    const std::string list = "Event&version=1&method=List";
+    const auto kinds = [&](const std::string& query, bool as_viewer) {
+        std::string found;
+        const Json::Value answer = Ask(list + query, "", as_viewer).Json();
+        for (const Json::Value& event : answer["data"]["event"]) {
+            found += event["kind"].asString() + std::to_string(event["camera_id"].asInt()) + ' ';
+        }
+        return found;
+    };
+    EXPECT_EQ(kinds("", false), "alert1 alert2 pos1 ") << "the newest first";
+    EXPECT_EQ(kinds("", true), "alert1 pos1 ");
+    EXPECT_EQ(kinds("&cameralists=2", true), "");
+    EXPECT_EQ(kinds("&cameralists=2,x,,3", false), "alert2 ");
+    EXPECT_EQ(kinds("&kind=pos", false), "pos1 ");
+    EXPECT_EQ(kinds("&from=1000010&to=1000011", false), "pos1 ");
+    EXPECT_EQ(kinds("&limit=1&offset=1", false), "alert2 ");
+    EXPECT_EQ(kinds("&cameralists=", false), "");
+}
+
+TEST_F(EventApi, RefusesBadInput) {
+    struct Case {
+        const char* query;
+        std::string form;  // empty: a GET
+        int status;
+        bool as_viewer = false;
+    };
+    const std::string late = std::to_string(base::WallMillis() / 1000 + 7200);
+    const Case cases[] = {
+        {"Event&version=1&method=Mark&kind=pos&camera=1", "", 405},
+        {"Event&version=1&method=Mark", "camera=1", 400},
+        {"Event&version=1&method=Mark", "kind=fire&camera=1", 400},
+        {"Event&version=1&method=Mark", "kind=1&camera=1", 400},
+        {"Event&version=1&method=Mark", "kind=pos", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=0", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=x", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=99", 404},
+        {"Event&version=1&method=Mark", "kind=pos&camera=2", 403, true},
+        {"Event&version=1&method=Mark", "kind=pos&camera=3", 403, true},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=0", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=-9223372036854775808", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=" + late, 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&length=-1", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&length=3601", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&text=a%07b", 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&text=" + std::string(8193, 'a'), 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&text={\"a\":1}", 400},
+        {"Event&version=1&method=List&from=5&to=5", "", 400},
+        {"Event&version=1&method=List&from=9223372036854775807", "", 400},
+        {"Event&version=1&method=List&limit=0", "", 400},
+        {"Event&version=1&method=List&limit=10001", "", 400},
+        {"Event&version=1&method=List&offset=-1", "", 400},
+        {"Event&version=1&method=List&offset=99999999999", "", 400},
+        {"Event&version=1&method=List&kind=all", "", 400},
+        {"Event&version=1&method=List&from=now", "", 400},
+        {"Event&version=1&method=Download", "", 404},
+        {"Event&version=1&method=Download&event=99", "", 404},
+        {"Event&version=1&method=Download&event=x", "", 400},
+        {"Event&version=1&method=Get&event=99", "", 404},
+        {"Event&version=1&method=Get&event=x", "", 400},
+        {"Event&version=2&method=List", "", 404},
+        {"Event&version=1&method=Erase", "", 404},
+        {"Catalog&version=1&method=Cameras", "", 404},
+        {"Catalog&version=2&method=Groups", "", 404},
+    };
+    for (const Case& each : cases) {
+        const Answer answer = Ask(each.query, each.form, each.as_viewer);
+        EXPECT_EQ(answer.status, each.status) << each.query << ' ' << each.form.substr(0, 80) << answer.body;
+    }
+    EXPECT_TRUE(store::Marks(footage_.Records()).Pending().empty());
+    for (const char* api :
+         {"Event&version=1&method=List", "Catalog&version=1&method=Groups", "Playback&version=1&method=GetPosition"}) {
+        EXPECT_EQ(host_.Ask(std::string("api=VEXO.") + api, "").status, 401) << api;
+    }
+}
+
+TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
+    const int event = footage_.Record(2, 1'772'366'400, 2);
+    const int alert = footage_.Mark(1, 2, 1'772'366'400, 1, "door", event);
+    for (const auto& [query, other_kind] : {std::pair{"&event=" + std::to_string(event), "&kind=pos"},
+                                            {"&kind=alert&event=" + std::to_string(alert), "&kind=pos"}}) {
+        for (const std::string method : {"Download", "Get"}) {
+            const std::string asked = "Event&version=1&method=" + method + query;
+            EXPECT_EQ(Ask(asked, "", true).status, 404) << "not even that it is there";
+            EXPECT_EQ(Ask(asked + other_kind).status, 404);
+        }
+        const Json::Value told = Ask("Event&version=1&method=Get" + query).Json()["data"];
+        EXPECT_EQ(told["camera_id"], 2);
+        EXPECT_EQ(told[told["kind"] == "event" ? "start" : "time"], 1'772'366'400);
+        EXPECT_EQ(told["frame_count"].isInt(), told["kind"] == "event");
+    }
+    std::ofstream(footage_.FileOf(event)) << "";
+    EXPECT_EQ(Ask("Event&version=1&method=Download&event=" + std::to_string(event)).status, 404) << "an empty file";
+    std::filesystem::remove(footage_.FileOf(event));
+    EXPECT_EQ(Ask("Event&version=1&method=Download&event=" + std::to_string(event)).status, 404)
+        << "a file that is gone";
+}
+
+TEST_F(EventApi, ListsGroupsAndMountsThatTheCallerMaySee) {
+    store::Groups groups(footage_.Records());
+    groups.Add({0, "Front", {1, 2}});
+    const int yard = groups.Add({0, "Yard", {3}});
+    store::Users(footage_.Records()).DenyGroup(2, yard);
+    viewer_ = host_.LogIn("guest").secret;
+    store::Mount empty;
+    empty.name = "Empty";
+    empty.path = "/nowhere";
+    store::Mounts(footage_.Records()).Add(empty);
+    const auto listed = [&](const char* method, const char* key, bool as_viewer) {
+        std::string text;
+        const Json::Value answer = Ask(std::string("Catalog&version=1&method=") + method, "", as_viewer).Json();
+        for (const Json::Value& each : answer["data"][key]) {
+            text += each["name"].asString() + ':';
+            for (const Json::Value& camera : each["camera"]) {
+                text += camera.asString() + ' ';
+            }
+        }
+        return text;
+    };
+    EXPECT_EQ(listed("Groups", "group", false), "Front:1 2 Yard:3 ");
+    EXPECT_EQ(listed("Groups", "group", true), "Front:1 ");
+    EXPECT_EQ(listed("Mounts", "mount", false), "Disk:1 2 3 Empty:");
+    EXPECT_EQ(listed("Mounts", "mount", true), "Disk:1 ");
+}
+
+}  // namespace
+}  // namespace lookhaven::api

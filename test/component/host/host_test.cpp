@@ -1,0 +1,360 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The web API host as a running program: what it answers, what it limits, and that nothing of a request stays behind.
+#include <array>
+#include <chrono>
+#include <csignal>
+#include <fstream>
+#include <random>
+#include <set>
+
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+
+#include "standalone/base/process.h"
+#include "standalone/store/users.h"
+#include "test/support/host/host_under_test.h"
+#include "test/support/host/scgi_bytes.h"
+
+namespace lookhaven::host {
+namespace {
+
+using namespace std::chrono_literals;
+
+bool HasPicture(const base::FileDescriptor& connection) {
+    std::array<char, 4096> block{};
+    const timeval limit{5, 0};
+    setsockopt(connection.Get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
+    std::string received;
+    while (received.find("picture") == received.npos) {
+        const ssize_t got = recv(connection.Get(), block.data(), block.size(), 0);
+        if (got <= 0) {
+            return false;
+        }
+        received.append(block.data(), static_cast<std::size_t>(got));
+    }
+    return true;
+}
+
+// The other end has closed: everything is read and nothing follows.
+bool IsOver(const base::FileDescriptor& connection) {
+    std::array<char, 65536> block{};
+    for (;;) {
+        const ssize_t got = recv(connection.Get(), block.data(), block.size(), MSG_DONTWAIT);
+        if (got <= 0) {
+            return got == 0 || errno == ECONNRESET;
+        }
+    }
+}
+
+TEST(Host, GivesTheAnswerThatFits) {
+    const HostUnderTest host;
+    const std::string admin = host.LogIn().secret;
+    const std::string test = "api=Test&version=1&method=";
+    const std::string live = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=";
+    struct Case {
+        std::string query;
+        std::string cookie;
+        int status;
+        HostUnderTest::Headers headers = {};
+        std::string body = "";
+    };
+    const Case cases[] = {
+        {test + "Success", admin, 200},
+        {test + "Error", admin, 200},
+        {test + "Nothing", admin, 502},
+        {test + "Silenced", admin, 502},
+        {test + "EmptyStream", admin, 504},
+        {test + "Throw", admin, 500},
+        {test + "ThrowNumber", admin, 500},
+        {test + "WrongType&text=abc", admin, 400},
+        {test + "Success", "", 401},
+        {test + "Success", "0123", 401},
+        {test + "Success", std::string(5000, 'x'), 401},
+        {live + "Success", "", 200},
+        {live + "Nothing", "", 401},
+        {live + "EmptyStream", "", 504},
+        {live + "EmptyStream", admin, 504},
+        {live + "Nothing", admin, 502},
+        {test + "Missing", admin, 404},
+        {"api=Test&version=2&method=Success", admin, 404},
+        {"api=Other&version=1&method=Success", admin, 404},
+        {"api=VEXO.Auth&version=1&method=Missing", admin, 404},
+        {"", admin, 404},
+        {"api=Test&version=abc&method=Success", admin, 400},
+        {"api=[1]&version=1&method=Success", admin, 400},
+        {test + "Success&p=%zz", admin, 400},
+        {test + "Success", admin, 400, {{"CONTENT_TYPE", "application/json"}}, "[]"},
+        {test + "Success", admin, 200, {{"CONTENT_TYPE", "application/json"}}, "{}"},
+        {test + "Success", admin, 405, {{"REQUEST_METHOD", "PUT"}}},
+        {test + "Success", admin, 403, {{"HTTP_SEC_FETCH_SITE", "cross-site"}}, "a=1"},
+        {test + "Success", admin, 200, {{"HTTP_SEC_FETCH_SITE", "same-origin"}}, "a=1"},
+        {test + "Success", admin, 403, {{"HTTP_ORIGIN", "https://evil.example"}, {"HTTP_HOST", "nvr:8443"}}, "a=1"},
+        {test + "Success", admin, 200, {{"HTTP_ORIGIN", "https://nvr:8443"}, {"HTTP_HOST", "nvr:8443"}}, "a=1"},
+    };
+    for (const Case& each : cases) {
+        const Answer answer = host.Ask(each.query, each.cookie, each.headers, each.body);
+        const Json::Value json = answer.Json();
+        EXPECT_EQ(answer.status, each.status) << each.query << each.body << answer.body;
+        EXPECT_EQ(answer.headers.at("Content-Type"), "application/json");
+        EXPECT_EQ(answer.headers.at("Cache-Control"), "no-store");
+        EXPECT_EQ(answer.headers.at("Content-Length"), std::to_string(answer.body.size()));
+        EXPECT_EQ(json["error"].isMember("message"), each.status != 200) << each.query;
+        if (each.status != 200) {
+            EXPECT_EQ(json["error"]["code"], each.status);
+            EXPECT_EQ(json["success"], false);
+        }
+    }
+    EXPECT_EQ(host.Ask(test + "Error", admin).Json()["error"]["code"], 401) << "the last of success and error counts";
+    EXPECT_EQ(host.Ask(test + "Raw", admin).body, "raw") << "nothing follows raw bytes";
+    EXPECT_EQ(host.Ask(test + "RawThenThrow", admin).body, "half");
+    EXPECT_EQ(host.Ask(test + "Crash", admin).status, 0);
+}
+
+TEST(Host, SurvivesMalformedRequests) {
+    const HostUnderTest host({"--read-seconds", "0.5"});
+    const std::string long_head = ScgiBytes({{"LONG", std::string(9000, 'x')}});
+    for (const std::string& bytes : {std::string("-5:"), std::string("GET / HTTP/1.1\r\n\r\n"), long_head,
+                                     ScgiBytes({}, std::string(2 << 20, 'x')), ScgiBytes({}) + "more"}) {
+        const Answer answer = host.Exchange(bytes);
+        EXPECT_EQ(answer.status, 400) << bytes.substr(0, 20);
+        EXPECT_EQ(answer.Json()["error"]["code"], 400);
+    }
+    EXPECT_EQ(host.Exchange("40:CONTENT_").status, 408) << "a request that never ends";
+    EXPECT_EQ(host.Ask("api=VEXO.Auth&version=1&method=Status", "").status, 401);
+}
+
+TEST(Host, TellsTheHandlerWhoCalls) {
+    const HostUnderTest host;
+    const store::NewSession session = host.LogIn("guest");
+    const Json::Value caller = host.Ask("api=Test&version=1&method=Caller", session.secret).Json()["data"];
+    EXPECT_EQ(caller["uid"], 2);
+    EXPECT_EQ(caller["name"], "guest");
+    EXPECT_EQ(caller["session"], session.handle) << "never the cookie";
+    EXPECT_EQ(caller["ip"], "192.0.2.7");
+    EXPECT_EQ(caller["admin"], false);
+    EXPECT_EQ(caller["authorized"], true);
+}
+
+TEST(Host, GivesTheHandlerAFreshProcess) {
+    const HostUnderTest host;
+    const std::string admin = host.LogIn().secret;
+    const base::FileDescriptor other = host.Open("Stream", admin);
+    ASSERT_TRUE(HasPicture(other));
+    const Json::Value found = host.Ask("api=Test&version=1&method=Surroundings", admin).Json()["data"];
+    EXPECT_EQ(found["masked"].size(), 0U);
+    const std::set<int> expected{SIGHUP, SIGINT, SIGQUIT, SIGUSR1, SIGUSR2, SIGPIPE};
+    std::set<int> got;
+    for (const Json::Value& number : found["ignored"]) {
+        got.insert(number.asInt());
+    }
+    EXPECT_EQ(got, expected);
+    EXPECT_EQ(found["nonblocking"], false);
+    EXPECT_EQ(found["log_pid"], 0);
+    EXPECT_LE(found["highest_descriptor"].asInt(), 8) << "the host's other connections are closed";
+}
+
+TEST(Host, EndsProcessesWhoseClientLeft) {
+    const HostUnderTest host({"--leave-seconds", "0.5"});
+    const std::string admin = host.LogIn().secret;
+    for (const char* method : {"Stream", "Hang", "DeafStream"}) {
+        base::FileDescriptor connection = host.Open(method, admin);
+        ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 1; })) << method;
+        if (std::string(method) != "Hang") {
+            ASSERT_TRUE(HasPicture(connection)) << method;
+        }
+        connection.Reset();
+        EXPECT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; })) << method;
+    }
+}
+
+TEST(Host, LimitsRequestsInAllAndPerSession) {
+    const HostUnderTest host({"--max-requests", "5", "--max-requests-per-session", "3"});
+    const std::string admin = host.LogIn().secret;
+    const std::string guest = host.LogIn("guest").secret;
+    std::vector<base::FileDescriptor> running;
+    const auto add = [&](const std::string& cookie) {
+        running.push_back(host.Open("Stream", cookie));
+        ASSERT_TRUE(HasPicture(running.back()));
+    };
+    for (int i = 0; i < 3; ++i) {
+        add(admin);
+    }
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 503);
+    // An answered request counts until its process is gone.
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 3; }));
+    add(guest);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", guest).status, 200);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 4; }));
+    add(guest);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", guest).status, 503);
+    running.clear();
+    EXPECT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 200);
+}
+
+TEST(Host, LimitsTimeAndMemoryOfWhatDoesNotStream) {
+    const HostUnderTest host({"--answer-seconds", "0.5"});
+    const std::string admin = host.LogIn().secret;
+    const base::FileDescriptor stream = host.Open("Stream", admin);
+    ASSERT_TRUE(HasPicture(stream));
+    const base::FileDescriptor hanging = host.Open("Hang", admin);
+    EXPECT_TRUE(Eventually(3s, [&] { return IsOver(hanging); }));
+    EXPECT_TRUE(HasPicture(stream)) << "a stream may go on for ever";
+#ifndef __SANITIZE_ADDRESS__
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Devour", admin).status, 500);
+#endif
+}
+
+TEST(Host, EndsStreamsOfEndedSessions) {
+    const HostUnderTest host;
+    const auto change = [&](const std::function<void(store::Store&)>& act) {
+        store::Store records = store::Store::Open(host.Home().StoreUrl());
+        act(records);
+    };
+    const store::NewSession kept = host.LogIn("admin");
+    const base::FileDescriptor other = host.Open("Stream", kept.secret);
+    ASSERT_TRUE(HasPicture(other));
+    struct Case {
+        const char* name;
+        std::function<void(const store::NewSession&)> end;
+    };
+    const Case cases[] = {
+        {"log-out",
+         [&](const store::NewSession& session) {
+             EXPECT_EQ(host.Ask("api=VEXO.Auth&version=1&method=Logout", session.secret, {}, "a=1").status, 200);
+         }},
+        {"ended in the store",
+         [&](const store::NewSession& session) {
+             change([&](store::Store& records) { store::Sessions(records).End(session.handle); });
+         }},
+        {"new password",
+         [&](const store::NewSession&) {
+             change([](store::Store& records) { store::Users(records).SetPassword(2, "a new password"); });
+         }},
+        {"denial",
+         [&](const store::NewSession&) { change([](store::Store& records) { store::Users(records).Deny(2, 1); }); }}};
+    for (const Case& each : cases) {
+        const store::NewSession session = host.LogIn("guest");
+        const base::FileDescriptor stream = host.Open("Stream", session.secret);
+        ASSERT_TRUE(HasPicture(stream)) << each.name;
+        each.end(session);
+        EXPECT_TRUE(Eventually(2s, [&] { return IsOver(stream); })) << each.name;
+        EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", session.secret).status, 401) << each.name;
+    }
+    EXPECT_FALSE(IsOver(other)) << "another's stream goes on";
+}
+
+TEST(Host, LeavesNothingAfterCutConnections) {
+    const HostUnderTest host;
+    const std::string admin = host.LogIn().secret;
+    const std::string request = ScgiBytes({{"REQUEST_METHOD", "GET"},
+                                           {"QUERY_STRING", "api=Test&version=1&method=Stream"},
+                                           {"HTTP_COOKIE", "id=" + admin}});
+    ASSERT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 200);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
+    const std::size_t descriptors = host.Descriptors();
+    std::mt19937 random(7);
+    for (int i = 0; i < 200; ++i) {
+        const base::FileDescriptor connection = host.Connect();
+        const std::size_t length = random() % 2 == 0 ? request.size() : random() % request.size();
+        send(connection.Get(), request.data(), length, MSG_NOSIGNAL);
+        std::array<char, 64> block{};
+        if (length == request.size() && random() % 2 == 0) {
+            recv(connection.Get(), block.data(), block.size(), 0);
+        }
+    }
+    EXPECT_TRUE(Eventually(5s, [&] { return host.RequestProcesses() == 0; }));
+    EXPECT_TRUE(Eventually(2s, [&] { return host.Descriptors() == descriptors; }))
+        << host.Descriptors() << " instead of " << descriptors;
+}
+
+TEST(Host, TakesItsProcessesAlong) {
+    for (const int signal : {SIGKILL, SIGTERM}) {
+        HostUnderTest host;
+        const base::FileDescriptor stream = host.Open("Stream", host.LogIn().secret);
+        ASSERT_TRUE(HasPicture(stream));
+        const std::vector<pid_t> children = host.Children();
+        ASSERT_EQ(children.size(), 2U) << "the stream and the watcher";
+        const std::filesystem::path socket = host.Home().WebApiSocket();
+        const int status = host.End(signal);
+        EXPECT_TRUE(Eventually(2s, [&] { return IsOver(stream); }));
+        for (const pid_t child : children) {
+            EXPECT_TRUE(Eventually(2s, [&] { return base::ProcessStartTicks(child) == 0; }));
+        }
+        if (signal == SIGTERM) {
+            EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
+            EXPECT_FALSE(std::filesystem::exists(socket));
+        }
+    }
+}
+
+TEST(Host, StartsItsWatcherAnew) {
+    const HostUnderTest host;
+    ASSERT_TRUE(Eventually(2s, [&] { return host.Children().size() == 1; }));
+    const pid_t watcher = host.Children().front();
+    kill(watcher, SIGKILL);
+    EXPECT_TRUE(Eventually(5s, [&] { return host.Children().size() == 1 && host.Children().front() != watcher; }));
+}
+
+TEST(Host, SweepsThePlayerFileOfAKilledProcess) {
+    const HostUnderTest host;
+    const store::NewSession session = host.LogIn();
+    const std::string file = "/tmp/player_src.pid." + session.handle;
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=DieWithPlayerFile", session.secret).status, 0);
+    EXPECT_TRUE(Eventually(2s, [&] { return !std::filesystem::exists(file); }));
+    std::ofstream(file) << 1;
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Nothing", session.secret).status, 502);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
+    EXPECT_TRUE(std::filesystem::remove(file)) << "another player's file stays";
+}
+
+TEST(Host, ServesASocketHandedOver) {
+    HostUnderTest host({}, true);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
+    const std::filesystem::path socket = host.Home().WebApiSocket();
+    host.End(SIGTERM);
+    EXPECT_TRUE(std::filesystem::exists(socket)) << "whoever opened it removes it";
+}
+
+TEST(Auth, LogsInAndOut) {
+    const HostUnderTest host;
+    const std::string query = "api=VEXO.Auth&version=1&method=";
+    const std::string right = "account=admin&password=right+password";
+    EXPECT_EQ(host.Ask(query + "Login&" + right, "").status, 405) << "a password belongs in a body";
+    const Answer wrong = host.Ask(query + "Login", "", {}, "account=admin&password=wrong");
+    EXPECT_EQ(wrong.status, 401);
+    EXPECT_EQ(host.Ask(query + "Login", "", {}, "account=nobody&password=wrong").body, wrong.body);
+    EXPECT_EQ(host.Ask(query + "Login", "", {}, "").status, 405);
+    const Answer plain = host.Ask(query + "Login", "", {}, right);
+    EXPECT_EQ(plain.status, 200);
+    EXPECT_EQ(plain.headers.at("Set-Cookie").find("Secure"), std::string::npos);
+    const Answer answer = host.Ask(query + "Login", "", {{"HTTPS", "on"}, {"CONTENT_TYPE", "application/json"}},
+                                   R"({"account":"admin","password":"right password"})");
+    EXPECT_EQ(answer.Json()["data"]["account"], "admin");
+    EXPECT_EQ(answer.Json()["data"]["is_manager"], true);
+    const std::string line = answer.headers.at("Set-Cookie");
+    EXPECT_TRUE(line.ends_with("; Path=/; HttpOnly; SameSite=Strict; Secure")) << line;
+    const std::string cookie = line.substr(3, line.find(';') - 3);
+    EXPECT_EQ(host.Ask(query + "Status", cookie).Json()["data"], answer.Json()["data"]);
+    EXPECT_EQ(host.Ask(query + "Logout", cookie).status, 405);
+    EXPECT_EQ(host.Ask(query + "Logout", cookie, {}, "a=1").status, 200);
+    EXPECT_EQ(host.Ask(query + "Status", cookie).status, 401);
+}
+
+TEST(Auth, SlowsDownGuessing) {
+    const HostUnderTest host;
+    const auto attempt = [&](const std::string& password) {
+        return host.Ask("api=VEXO.Auth&version=1&method=Login", "", {}, "account=guest&password=" + password);
+    };
+    for (int i = 0; i < 5; ++i) {
+        EXPECT_EQ(attempt("wrong").status, 401);
+    }
+    const Answer barred = attempt("other+password");
+    EXPECT_EQ(barred.status, 429);
+    EXPECT_EQ(barred.Json()["error"]["code"], 429);
+}
+
+}  // namespace
+}  // namespace lookhaven::host

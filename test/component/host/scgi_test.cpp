@@ -1,0 +1,148 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The SCGI parser against requests that are whole, broken, hostile, and cut at any byte.
+#include "standalone/host/scgi.h"
+
+#include <random>
+
+#include <gtest/gtest.h>
+
+#include "test/support/host/scgi_bytes.h"
+
+namespace lookhaven::host {
+namespace {
+
+using State = ScgiParser::State;
+using namespace std::string_literals;
+
+std::string Netstring(const std::string& head) {
+    return std::to_string(head.size()) + ":" + head + ",";
+}
+
+State FeedAll(ScgiParser& parser, std::string_view bytes, std::size_t step) {
+    State state = State::kIncomplete;
+    for (; !bytes.empty(); bytes.remove_prefix(std::min(step, bytes.size()))) {
+        state = parser.Feed(bytes.substr(0, step));
+    }
+    return state;
+}
+
+TEST(Scgi, TakesARequestHoweverItIsCut) {
+    const std::string bytes = ScgiBytes({{"REQUEST_METHOD", "POST"}, {"EMPTY", ""}}, "name=value\0,:"s);
+    std::mt19937 random(1);
+    for (int round = 0; round < 200; ++round) {
+        ScgiParser parser;
+        std::string_view rest = bytes;
+        while (!rest.empty()) {
+            const std::size_t piece = std::min<std::size_t>(rest.size(), 1 + random() % 20);
+            ASSERT_EQ(parser.Feed(rest.substr(0, piece)), piece == rest.size() ? State::kComplete : State::kIncomplete);
+            rest.remove_prefix(piece);
+        }
+        const http::Request request = parser.TakeRequest();
+        EXPECT_EQ(request.Header("REQUEST_METHOD"), "POST");
+        EXPECT_EQ(request.headers.count("EMPTY"), 1U);
+        EXPECT_EQ(request.body, "name=value\0,:"s);
+    }
+}
+
+struct Case {
+    const char* name;
+    std::string bytes;
+    State expected;
+};
+
+TEST(Scgi, RefusesWhatIsNotARequest) {
+    const std::string kStart = "CONTENT_LENGTH\0"
+                               "0\0SCGI\0"
+                               "1\0"s;
+    const std::string kBig(ScgiParser::kMaxHeadBytes, 'x');
+    const Case cases[] = {
+        {"least request", Netstring(kStart), State::kComplete},
+        {"largest head", Netstring(kStart + "A\0"s + kBig.substr(kStart.size() + 3) + "\0"s), State::kComplete},
+        {"head too large", std::to_string(kBig.size() + 1) + ":", State::kMalformed},
+        {"length without end", "99999999999999999999999999", State::kMalformed},
+        {"negative length", "-5:", State::kMalformed},
+        {"no length", ":", State::kMalformed},
+        {"leading zero", "024:" + kStart + ",", State::kMalformed},
+        {"HTTP", "GET / HTTP/1.1\r\n\r\n", State::kMalformed},
+        {"space before length", " 24:" + kStart + ",", State::kMalformed},
+        {"no comma", std::to_string(kStart.size()) + ":" + kStart + ";", State::kMalformed},
+        {"length too small", std::to_string(kStart.size() - 1) + ":" + kStart + ",", State::kMalformed},
+        {"length too large", std::to_string(kStart.size() + 1) + ":" + kStart + ",", State::kIncomplete},
+        {"no CONTENT_LENGTH",
+         Netstring("SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH second",
+         Netstring("SCGI\0"
+                   "1\0CONTENT_LENGTH\0"
+                   "0\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH twice",
+         Netstring(kStart + "CONTENT_LENGTH\0"
+                            "5\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH empty",
+         Netstring("CONTENT_LENGTH\0\0SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH negative",
+         Netstring("CONTENT_LENGTH\0-1\0SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH hex",
+         Netstring("CONTENT_LENGTH\0"
+                   "0x1\0SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"CONTENT_LENGTH overflow",
+         Netstring("CONTENT_LENGTH\0"
+                   "99999999999999999999999\0SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"body too large",
+         Netstring("CONTENT_LENGTH\0"
+                   "1048577\0SCGI\0"
+                   "1\0"s),
+         State::kMalformed},
+        {"largest body announced",
+         Netstring("CONTENT_LENGTH\0"
+                   "1048576\0SCGI\0"
+                   "1\0"s),
+         State::kIncomplete},
+        {"SCGI missing",
+         Netstring("CONTENT_LENGTH\0"
+                   "0\0"s),
+         State::kMalformed},
+        {"SCGI 2",
+         Netstring("CONTENT_LENGTH\0"
+                   "0\0SCGI\0"
+                   "2\0"s),
+         State::kMalformed},
+        {"a name twice",
+         Netstring(kStart + "A\0"
+                            "1\0A\0"
+                            "2\0"s),
+         State::kMalformed},
+        {"empty name",
+         Netstring(kStart + "\0"
+                            "1\0"s),
+         State::kMalformed},
+        {"value without end",
+         Netstring(kStart + "A\0"
+                            "1"s),
+         State::kMalformed},
+        {"name without value", Netstring(kStart + "A\0"s), State::kMalformed},
+        {"bytes behind the body", Netstring(kStart) + "x", State::kMalformed},
+    };
+    for (const Case& each : cases) {
+        for (const std::size_t step : {std::size_t{1}, each.bytes.size()}) {
+            ScgiParser parser;
+            EXPECT_EQ(FeedAll(parser, each.bytes, step), each.expected) << each.name << ", in steps of " << step;
+            EXPECT_EQ(parser.Problem().empty(), each.expected != State::kMalformed) << each.name;
+        }
+    }
+}
+
+}  // namespace
+}  // namespace lookhaven::host

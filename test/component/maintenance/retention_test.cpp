@@ -1,0 +1,156 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Old recordings make room: what goes, and all that must not go with it.
+#include "standalone/maintenance/retention.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdlib>
+#include <fstream>
+#include <functional>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "standalone/archive/layout.h"
+#include "standalone/archive/recording_log.h"
+#include "standalone/base/installation.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/store/marks.h"
+#include "test/support/footage/footage.h"
+
+namespace lookhaven::maintenance {
+namespace {
+
+namespace fs = std::filesystem;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr std::int64_t kNoon = 1772366400;
+constexpr std::int64_t kEventBytes = 1'572'864;
+constexpr std::int64_t kNow = kNoon + 86400;
+
+class RetentionTest : public testing::Test {
+  protected:
+    RetentionTest() { MountFolder::Mark(footage_.Mount(), footage_.MountId()); }
+    ~RetentionTest() override { fs::remove_all(folder_); }
+
+    static fs::path MakeFolder() {
+        std::string folder = "/tmp/lookhaven-retention.XXXXXX";
+        base::Installation::CreateFolders(mkdtemp(folder.data()));
+        store::Store::Migrate(base::Installation(folder).StoreUrl());
+        return folder;
+    }
+
+    Removed Run(std::int64_t max_bytes, std::int64_t max_age_s = 0) {
+        store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
+        mount.max_bytes = max_bytes;
+        mount.max_age_s = max_age_s;
+        return Retain(footage_.Records(), mount, kNow);
+    }
+
+    std::vector<int> Left() {
+        std::vector<int> ids;
+        store::Events(footage_.Records())
+            .Visit({.camera_ids = {1, 2, 3}, .end_s = kNow},
+                   [&](const store::Event& event) { ids.push_back(event.id); });
+        std::sort(ids.begin(), ids.end());
+        return ids;
+    }
+
+    const fs::path folder_ = MakeFolder();
+    test::Footage footage_{base::Installation(folder_).StoreUrl(), folder_};
+};
+
+TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
+    const int second = footage_.Record(1, kNoon + 100, 60);
+    const int first = footage_.Record(2, kNoon, 60);
+    const int third = footage_.Record(1, kNoon + 160, 60);
+    const std::vector<fs::path> gone = {footage_.FileOf(first), footage_.FileOf(second)};
+    EXPECT_EQ(Run(3 * kEventBytes).events, 0) << "as much as is allowed";
+    const Removed removed = Run(kEventBytes);
+    EXPECT_EQ(removed.events, 2);
+    EXPECT_EQ(removed.bytes, 2 * kEventBytes);
+    EXPECT_THAT(Left(), ElementsAre(third));
+    for (const fs::path& file : gone) {
+        EXPECT_FALSE(fs::exists(file) || fs::exists(archive::IndexPathOf(file)));
+    }
+    EXPECT_TRUE(fs::exists(footage_.FileOf(third)));
+    EXPECT_FALSE(fs::exists(footage_.Mount() / "2")) << "a camera without recordings leaves no folder";
+    std::vector<unsigned char> log(120);
+    ASSERT_TRUE(archive::ReadRecordingLog(footage_.Mount() / "1", kNoon + 100, log));
+    EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "what is gone is not said to be there";
+    EXPECT_EQ(std::count(log.begin() + 60, log.end(), 0), 0);
+}
+
+TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {
+    const int old = footage_.Record(1, kNow - 161, 60);
+    const int young = footage_.Record(1, kNow - 159, 60);
+    EXPECT_EQ(Run(0, 101).events, 1);
+    EXPECT_THAT(Left(), ElementsAre(young));
+    EXPECT_EQ(Run(0, 0).events, 0) << "no limit at all";
+    EXPECT_FALSE(store::Events(footage_.Records()).Find(old));
+}
+
+TEST_F(RetentionTest, WhatIsKeptOnPurposeOrUnknownStays) {
+    const int archived = footage_.Record(1, kNoon, 60);
+    const int growing = footage_.Record(1, kNoon + 100, 60);
+    const int plain = footage_.Record(1, kNoon + 200, 60);
+    store::Events events(footage_.Records());
+    events.SetArchived(archived, true);
+    store::Event open = *events.Find(growing);
+    open.recording = true;
+    events.Remove(std::array{growing});
+    events.Begin(open);
+    const fs::path stranger = footage_.FileOf(plain).parent_path() / "holiday.mkv";
+    std::ofstream(stranger) << "mine";
+    Run(1);
+    EXPECT_THAT(Left(), ElementsAre(archived, growing));
+    EXPECT_TRUE(fs::exists(stranger));
+    EXPECT_TRUE(fs::exists(footage_.FileOf(archived)) && fs::exists(footage_.FileOf(growing)));
+}
+
+TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
+    const int event = footage_.Record(1, kNoon, 60);
+    for (const auto& hide : std::initializer_list<std::function<void()>>{
+             [&] { fs::remove(footage_.Mount() / ".lookhaven-mount"); },
+             [&] { MountFolder::Mark(footage_.Mount(), footage_.MountId() + 1); },
+             [&] { fs::rename(footage_.Mount(), folder_ / "unplugged"); },
+         }) {
+        hide();
+        EXPECT_EQ(Run(1, 1).events, 0);
+        EXPECT_THAT(Left(), ElementsAre(event));
+    }
+}
+
+TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
+    const int first = footage_.Record(1, kNoon, 60);
+    footage_.Record(1, kNoon + 60, 60);
+    const int mark = footage_.Mark(1, 1, kNoon + 50, 30, "Door", first);
+    store::Marks marks(footage_.Records());
+    EXPECT_EQ(Run(kEventBytes).marks, 0);
+    EXPECT_TRUE(marks.Find(store::MarkKind::kAlert, mark)) << "half of it can be shown";
+    EXPECT_EQ(Run(1).marks, 1);
+    EXPECT_FALSE(marks.Find(store::MarkKind::kAlert, mark));
+    EXPECT_THAT(Left(), IsEmpty());
+    EXPECT_FALSE(fs::exists(footage_.Mount() / "1"));
+}
+
+TEST_F(RetentionTest, APathThatLeadsAwayRemovesNothing) {
+    const int event = footage_.Record(1, kNoon, 60);
+    std::ofstream(folder_ / "precious") << "x";
+    fs::create_directory_symlink(folder_, footage_.Mount() / "2");
+    store::Events events(footage_.Records());
+    for (const char* path : {"../precious", "/etc/passwd", "2/precious", ""}) {
+        store::Event hostile = *events.Find(event);
+        hostile.id = events.NextId();
+        hostile.path = path;
+        events.AddAll(std::array{hostile});
+    }
+    Run(1);
+    EXPECT_THAT(Left(), IsEmpty());
+    EXPECT_TRUE(fs::exists(folder_ / "precious"));
+}
+
+}  // namespace
+}  // namespace lookhaven::maintenance

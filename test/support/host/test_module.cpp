@@ -1,0 +1,188 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A web API module whose methods behave in every way that a host must be ready for.
+#include <atomic>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include "platform/log/dbglogcfg.h"
+#include "platform/output/multipartresponse.h"
+#include "platform/webapi/apirequest.h"
+#include "platform/webapi/apiresponse.h"
+#include "test/support/host/test_player.h"
+
+namespace {
+
+using VEXO::APIRequest;
+using VEXO::APIResponse;
+
+std::atomic<bool> g_stop;
+
+void StopOnSigterm() {
+    struct sigaction action {};
+    action.sa_handler = [](int) { g_stop = true; };
+    sigaction(SIGTERM, &action, nullptr);
+}
+
+void Stream(bool deaf) {
+    MultipartResponse response;
+    while (deaf || !g_stop) {
+        response.Write("image/jpeg", "picture", 7, nullptr);
+        usleep(10'000);
+    }
+}
+
+Json::Value SetOfSignals(const sigset_t& signals) {
+    Json::Value numbers(Json::arrayValue);
+    for (int number = 1; number < 32; ++number) {
+        if (sigismember(&signals, number) == 1) {
+            numbers.append(number);
+        }
+    }
+    return numbers;
+}
+
+// What a request process finds around itself.
+Json::Value Surroundings() {
+    Json::Value found;
+    sigset_t mask;
+    sigset_t ignored;
+    sigemptyset(&ignored);
+    sigprocmask(SIG_SETMASK, nullptr, &mask);
+    for (int number = 1; number < 32; ++number) {
+        struct sigaction action {};
+        if (sigaction(number, nullptr, &action) == 0 && action.sa_handler == SIG_IGN) {
+            sigaddset(&ignored, number);
+        }
+    }
+    found["masked"] = SetOfSignals(mask);
+    found["ignored"] = SetOfSignals(ignored);
+    found["nonblocking"] = (fcntl(STDOUT_FILENO, F_GETFL) & O_NONBLOCK) != 0;
+    found["log_pid"] = g_DbgLogPid;
+    found["highest_descriptor"] = 0;
+    for (int descriptor = 0; descriptor < 1024; ++descriptor) {
+        if (fcntl(descriptor, F_GETFD) >= 0) {
+            found["highest_descriptor"] = descriptor;
+        }
+    }
+    return found;
+}
+
+Json::Value Caller(const APIRequest& request) {
+    Json::Value caller;
+    caller["uid"] = request.GetLoginUID();
+    caller["name"] = request.GetLoginUserName();
+    caller["session"] = request.GetSessionID();
+    caller["ip"] = request.GetRemoteIP();
+    caller["admin"] = request.IsAdmin();
+    caller["authorized"] = request.IsAuthorized();
+    caller["pid"] = getpid();
+    return caller;
+}
+
+// As a player does that is then killed.
+void DieWithPlayerFile(const std::string& session) {
+    std::FILE* file = std::fopen(("/tmp/player_src.pid." + session).c_str(), "w");
+    std::fprintf(file, "%d", getpid());
+    std::fclose(file);
+    raise(SIGKILL);
+}
+
+void Play(APIRequest* request, APIResponse*) {
+    PlayTest(*request);
+}
+
+void Serve(APIRequest* request, APIResponse* response) {
+    const std::string method = request->GetAPIMethod();
+    if (method == "Success") {
+        response->SetSuccess(request->GetParam("", Json::nullValue));
+    } else if (method == "Error") {
+        response->SetSuccess(1);
+        response->SetError(401, "param");
+    } else if (method == "Silenced") {
+        response->SetSuccess(1);
+        response->SetEnableOutput(false);
+    } else if (method == "Throw") {
+        throw std::runtime_error("thrown on purpose");
+    } else if (method == "ThrowNumber") {
+        throw 5;
+    } else if (method == "WrongType") {
+        request->GetParam("text", 0).asInt();
+    } else if (method == "Raw") {
+        std::printf("Content-Type: text/plain\r\n\r\nraw");
+        response->SetSuccess("not after raw bytes");
+    } else if (method == "RawThenThrow") {
+        std::printf("Content-Type: text/plain\r\n\r\nhalf");
+        throw std::runtime_error("thrown on purpose");
+    } else if (method == "EmptyStream") {
+        const MultipartResponse nothing;
+    } else if (method == "Stream") {
+        StopOnSigterm();
+        Stream(false);
+    } else if (method == "DeafStream") {
+        signal(SIGTERM, SIG_IGN);
+        Stream(true);
+    } else if (method == "Hang") {
+        for (;;) {
+            pause();
+        }
+    } else if (method == "Devour") {
+        std::vector<char> much(std::size_t{2} << 30);
+        response->SetSuccess(much.back());
+    } else if (method == "Crash") {
+        std::abort();
+    } else if (method == "DieWithPlayerFile") {
+        DieWithPlayerFile(request->GetSessionID());
+    } else if (method == "Surroundings") {
+        response->SetSuccess(Surroundings());
+    } else if (method == "Caller") {
+        response->SetSuccess(Caller(*request));
+    }
+}
+
+struct Row {
+    const char* api;
+    int version;
+    const char* method;
+    void (*entry)(APIRequest*, APIResponse*);
+};
+
+const Row kTable[] = {{"Test", 1, "Nothing", Serve},
+                      {"Test", 1, "Success", Serve},
+                      {"Test", 1, "Error", Serve},
+                      {"Test", 1, "Silenced", Serve},
+                      {"Test", 1, "Throw", Serve},
+                      {"Test", 1, "ThrowNumber", Serve},
+                      {"Test", 1, "WrongType", Serve},
+                      {"Test", 1, "Raw", Serve},
+                      {"Test", 1, "RawThenThrow", Serve},
+                      {"Test", 1, "EmptyStream", Serve},
+                      {"Test", 1, "Stream", Serve},
+                      {"Test", 1, "DeafStream", Serve},
+                      {"Test", 1, "Hang", Serve},
+                      {"Test", 1, "Devour", Serve},
+                      {"Test", 1, "Crash", Serve},
+                      {"Test", 1, "DieWithPlayerFile", Serve},
+                      {"Test", 1, "Surroundings", Serve},
+                      {"Test", 1, "Caller", Serve},
+                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Serve},
+                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", Serve},
+                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Serve},
+                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEvent", Play},
+                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEventNoFrameId", Play},
+                      {nullptr, 0, nullptr, nullptr}};
+
+}  // namespace
+
+extern "C" LH_PLATFORM_API const void* GetAPITable() {
+    return kTable;
+}
