@@ -15,6 +15,10 @@
 #include "test/support/host/host_under_test.h"
 
 namespace lookhaven::api {
+
+using host::Answer;
+using host::HostUnderTest;
+
 namespace {
 
 class EventApi : public testing::Test {

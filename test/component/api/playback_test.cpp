@@ -16,6 +16,11 @@
 #include "test/support/host/host_under_test.h"
 
 namespace lookhaven::api {
+
+using host::Answer;
+using host::Eventually;
+using host::HostUnderTest;
+
 namespace {
 
 using namespace std::chrono_literals;
