@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/admit.h"
 
-#include "standalone/api/session_cookie.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/sessions.h"
@@ -56,7 +55,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
 void Admit(Call& call, std::size_t max_requests) {
     call.login = FindLogin(call);
     const Json::Value& priv_data = call.Parameter("privData");
-    call.context.Renounce(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
+    call.context.RestrictByPrivData(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
     if (!call.login) {
         if (call.api != kSelfAdmittingApi) {
             throw Failure(401, "no session");

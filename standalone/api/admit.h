@@ -10,6 +10,8 @@
 
 namespace lookhaven::api {
 
+constexpr const char* kSessionCookie = "id";  // carries the session's secret
+
 // Throws Failure 405 for another method than GET and POST, 403 for a POST that another site's page made a browser send.
 void CheckOrigin(const http::Request& request);
 

@@ -4,7 +4,6 @@
 #include "standalone/api/admit.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
-#include "standalone/api/session_cookie.h"
 
 #include "standalone/base/clock.h"
 #include "standalone/store/login_throttle.h"

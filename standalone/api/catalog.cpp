@@ -39,7 +39,7 @@ std::string Groups(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// A mount without a camera that the caller may see is nothing to a viewer.
+// A viewer is not shown a mount without a camera that he may see.
 std::string Mounts(const Call& call) {
     const bool is_manager = binding::IsManager();
     Json::Value data;

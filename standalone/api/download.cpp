@@ -48,7 +48,7 @@ std::string TitleOf(store::Store& records, const Footage& footage) {
     return (camera ? camera->name : "Camera " + std::to_string(footage.camera_id)) + ' ' + time;
 }
 
-// Both spellings: one for every client, one that keeps the camera's name as it is.
+// The plain form for every client, and the encoded one, which keeps the camera's name as it is.
 std::string Disposition(const std::string& title) {
     std::string plain;
     std::string encoded;
@@ -85,7 +85,7 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
                              Disposition(TitleOf(records, *footage)) + "\r\n\r\n";
     call.context.CloseRecords();
     call.context.NoteStream();
-    // What cannot be read at all should be said while there still is an answer to give.
+    // Checked while an error answer is still possible.
     if (archive::Recording(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }

@@ -18,7 +18,7 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr std::int64_t kMaxAheadSeconds = 3600;  // a till's clock may be off
+constexpr std::int64_t kMaxAheadSeconds = 3600;  // a POS terminal's clock may be off
 constexpr int kMaxListed = 10'000;
 
 std::optional<store::MarkKind> KindOf(const Call& call) {
@@ -71,7 +71,7 @@ Json::Value Describe(const store::Mark& mark) {
     return json;
 }
 
-// With the names that the search of recorded events has for them.
+// With the same member names as the search of recorded events.
 Json::Value Describe(const store::Event& event) {
     Json::Value json;
     json["id"] = event.id;

@@ -25,8 +25,8 @@ struct ApiRow {
 
 class Modules {
   public:
-    // Loads the shared object for the rest of the process's life and takes in its table. Throws std::runtime_error when
-    // it cannot be loaded, exports no table, or names a method that is there already.
+    // Loads the shared object for the rest of the process's life and reads its table. Throws std::runtime_error when
+    // it cannot be loaded, exports no table, or names a method that another module has.
     void Load(const std::filesystem::path& path);
 
     // Null when no module has that method.

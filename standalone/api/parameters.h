@@ -20,7 +20,7 @@ using Parameters = std::map<std::string, Json::Value>;
 // one JSON object or has an account, password or cookie that is no text, or a body of another type.
 Parameters ReadParameters(const http::Request& request);
 
-// The cookies of the request; lines that are no name=value are passed over.
+// The cookies of the request; pairs that are not name=value are skipped.
 std::map<std::string, std::string> ReadCookies(const http::Request& request);
 
 }  // namespace lookhaven::api

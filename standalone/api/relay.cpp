@@ -2,8 +2,8 @@
 //
 // VEXO.Relay: the live view of a recording server's camera on this host's origin.
 //
-// Why so        A browser has no login at the other server. This host looks whether the caller may see the camera, and tells
-//               the web server to fetch it with a token that is good for minutes; secret and token never reach the browser.
+// Why so        A browser has no session at the other server. This host checks whether the caller may see the camera, and has
+//               the web server fetch it with a token that is valid for minutes; secret and token never reach the browser.
 #include "standalone/api/own_apis.h"
 
 #include <memory>
@@ -21,13 +21,13 @@ namespace lookhaven::api {
 
 namespace {
 
-// Without sending anything: an address of a family that this machine does not speak has no route.
+// Sends nothing: a datagram socket can be connected only where there is a route.
 bool HasRoute(const addrinfo& address) {
     const base::FileDescriptor probe(::socket(address.ai_family, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     return probe && ::connect(probe.Get(), address.ai_addr, address.ai_addrlen) == 0;
 }
 
-// The web server knows no names, and one that is gone must not keep it from starting: so this process looks them up.
+// Names are resolved here: the web server would resolve them once, when it starts, and not start when one fails.
 std::string NumericAddress(const std::string& name, int port) {
     addrinfo hints{};
     hints.ai_socktype = SOCK_STREAM;

@@ -51,7 +51,7 @@ Call ReadCall(const http::Request& request, control::SlotTable& slots, control::
     return call;
 }
 
-// Runs the module's function; returns the host's answer, empty when the client has one already.
+// Runs the module's entry function; empty when it has answered by itself.
 std::string RunModule(EntryFunction entry, const Call& call) {
     VEXO::APIRequest::Context asked{call.parameters, call.cookies, call.method,
                                     std::string(call.request.Header("REMOTE_ADDR")), call.login};
@@ -75,7 +75,7 @@ std::string RunModule(EntryFunction entry, const Call& call) {
     throw Failure(502, "the handler gave no answer");
 }
 
-// Runs the method of our own API; what the store refuses is the caller's fault.
+// The store's refusals of a change become failures that the caller is told.
 std::string RunMethod(const OwnApi& api, const Call& call) {
     const Method& method = api.Find(call.version, call.method);
     if (method.effect == Method::Effect::kChanges && call.request.Header("REQUEST_METHOD") != "POST") {
@@ -148,7 +148,7 @@ void ServeRequest(const Service& service, const http::Request& request, control:
     binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);
-    // What was written before an exception cannot be taken back, and nothing may stand behind it.
+    // What was written before an exception cannot be taken back, and nothing may follow it.
     if (output.BytesSent() == 0) {
         std::fwrite(answer.data(), 1, answer.size(), stdout);
         std::fflush(stdout);

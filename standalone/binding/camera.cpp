@@ -130,7 +130,7 @@ std::string Camera::GetStoragePath() const {
     });
 }
 
-// A store that fails is the caller's failure too: an empty list would tell of a host without cameras.
+// An exception of the store ends the request: an empty list would say that the host has no cameras.
 std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds, const std::string& deniedIds, bool,
                                   bool) {
     std::list<Camera> cameras;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Sets of cameras to play back from, without those that the caller may not.
+// Sets of cameras to play back from, without those that are denied to the caller.
 #include "platform/camera/camgroup.h"
 
 #include "standalone/binding/camera_record.h"
@@ -18,7 +18,7 @@ using lookhaven::binding::RequestContext;
 
 namespace {
 
-// Of a camera that was removed nothing is left but its number and its recordings.
+// A camera that was removed leaves its id and its recordings.
 Camera RecordOfRemoved(int id) {
     Camera camera;
     camera.m_Id = id;

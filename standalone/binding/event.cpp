@@ -26,7 +26,7 @@ static_assert(store::kReasonContinuous == REC_METHOD_CONTINUOUS && store::kReaso
 
 namespace {
 
-// The platform's seconds end in 2038.
+// The platform's seconds are 32-bit and end in 2038.
 int Narrow(std::int64_t seconds) {
     return static_cast<int>(std::clamp<std::int64_t>(seconds, 0, std::numeric_limits<int>::max()));
 }

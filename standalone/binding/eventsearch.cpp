@@ -80,7 +80,7 @@ int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
     });
 }
 
-// The camera may have recorded to other mounts before: what its folders there tell counts too.
+// The camera may have recorded to other mounts before; its recording logs there count too.
 int ReadRecLog(const std::string& storagePath, long from, int duration, unsigned char* buffer) {
     return OrFailure("ReadRecLog", -1, [&] {
         const std::filesystem::path asked(storagePath);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Why so        A player that samples repeats the last picture without a pause for ever, and so does one at the end of its
-//               range. So a repeated index is answered slowly, and from memory.
+// Why so        A player that samples, and one at the end of its range, asks for the last picture again and again without a
+//               pause. So a repeated index is answered from memory, and not sooner than 200 ms after the last.
 #include "platform/recording/jpegextractor.h"
 
 #include <algorithm>
@@ -51,8 +51,8 @@ struct JpegExtractor::Recording {
     std::vector<std::uint8_t> repeated;  // the picture of last_index once it was asked for again; else empty
 };
 
-// Waits for the frame of an index that is past the end. A signal ends the wait with the newest frame instead: a player
-// that is paused, say, should not end.
+// Waits for the frame of an index that is past the end. A signal ends the wait with the newest frame instead, so
+// that a player which is being paused does not end.
 bool JpegExtractor::Recording::AwaitTail(int& index) {
     const std::int64_t until_us = MonotonicMicros() + kTailWaitUs;
     while (index >= frames.FrameCount()) {

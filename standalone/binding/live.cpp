@@ -54,7 +54,8 @@ DataEntry* Held(const ring::Entry* entry) {
     return reinterpret_cast<DataEntry*>(const_cast<ring::Entry*>(entry));
 }
 
-// The recorder has left the ring for a new one: its reader should come again rather than wait for a time-out.
+// The recorder has replaced the ring by a new one: its reader ends, so that the client reconnects at once instead of after
+// a time-out.
 void EndReaderOfRetired(const void* stream) {
     if (ring::IsRetired(stream)) {
         std::raise(SIGTERM);
@@ -191,8 +192,8 @@ void LiveStreamUpdater::StartLive() {
     UpdateStamp();
 }
 
-// Only for the stream that the caller was given: a wish alone must not start a camera that the caller may not see.
-// Attaching wishes for itself.
+// Only for the stream that the caller has been granted: a stamp alone must not start a camera that the caller may not
+// see. Attaching stamps by itself.
 void LiveStreamUpdater::UpdateStamp() {
     OrFailure("LiveStreamUpdater", 0, [&] {
         const RequestContext& context = RequestContext::Current();

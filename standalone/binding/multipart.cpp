@@ -20,7 +20,7 @@ namespace {
 using lookhaven::binding::Output;
 using lookhaven::binding::RequestContext;
 
-// Appends decimal digits; a stream does this for every picture, so without the machinery of printf.
+// Appends decimal digits, without printf: a stream does this for every picture.
 void AppendNumber(std::string& text, std::int64_t number, int width = 1) {
     std::array<char, 24> digits;
     const auto end = std::to_chars(digits.data(), digits.data() + digits.size(), number).ptr;

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The way of a request's bytes to its client: everything that standard output or a multipart answer writes passes here.
+// Sends a request's bytes to its client: everything that standard output or a multipart answer writes.
 //
-// Why so        A player looks at no write result, so this place must see to it that a client which is gone or takes
-//               nothing ends the player, and that nothing ever follows a part that could not be sent whole.
-// Invariants    (1) Once broken, for good: later writes send nothing and ferror(stdout) stays set.
+// Why so        A player ignores the results of its writes. So the output itself ends the player when its client is gone or
+//               has stalled, and never sends anything behind a part that could not be sent whole.
+// Invariants    (1) Once broken it stays broken: later writes send nothing and ferror(stdout) stays set.
 //               (2) No call blocks for longer than the limits allow.
 // Thread safety One thread.
 #pragma once
@@ -29,8 +29,9 @@ struct OutputLimits {
 
 class LH_PLATFORM_API Output {
   public:
-    // Replaces stdout by a stream onto the socket until destruction. The socket is borrowed. is_to_leave tells whether a
-    // signal is a reason to hurry: one that pauses a player is none, and its viewer may be slow.
+    // Replaces stdout by a stream onto the socket until destruction. The socket is borrowed. is_to_leave tells
+    // whether the process has been asked to end, so that a write interrupted by a signal gets the shorter limit; the
+    // signal that pauses a player is no such request.
     explicit Output(
         int socket, OutputLimits limits = {}, std::function<bool()> is_to_leave = [] { return true; });
     ~Output();
@@ -41,7 +42,7 @@ class LH_PLATFORM_API Output {
     // the call that breaks it raises SIGTERM in this process.
     bool Send(std::span<iovec> pieces);
 
-    // What the socket has taken. Flush stdout before asking.
+    // Bytes that the socket has accepted; flush stdout before asking.
     std::uint64_t BytesSent() const { return bytes_sent_; }
     bool IsBroken() const { return broken_; }
     // Separates the parts of this process's multipart answer.

@@ -49,8 +49,8 @@ std::set<int> SoundDeniedBy(const Json::Value& priv_data) {
 bool MayUse(int camera, store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     const unsigned int caller = context.Caller();
-    if (caller == 0 || context.RenouncedCameras().contains(camera) ||
-        (kind == store::CameraAccess::kAudio && context.RenouncedSound().contains(camera))) {
+    if (caller == 0 || context.CamerasDeniedByRequest().contains(camera) ||
+        (kind == store::CameraAccess::kAudio && context.SoundDeniedByRequest().contains(camera))) {
         return false;
     }
     if (caller == PAIR_AUTH_UID) {
@@ -80,7 +80,7 @@ bool IsManager() {
 
 std::set<int> DeniedCameras(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
-    std::set<int> denied = context.RenouncedCameras();
+    std::set<int> denied = context.CamerasDeniedByRequest();
     if (context.Caller() != PAIR_AUTH_UID) {
         denied.merge(store::Users(context.Records()).DeniedCameras(static_cast<int>(context.Caller()), kind));
     }
@@ -91,12 +91,12 @@ std::set<int> DeniedCameras(store::CameraAccess kind) {
 
 namespace {
 
-// Neither nobody nor a peer.
+// A user of this host: neither nobody nor a paired host.
 bool IsUser(int profile_id) {
     return profile_id != 0 && profile_id != static_cast<int>(PAIR_AUTH_UID);
 }
 
-// What is denied to nobody is everything, which no set can say: such a request fails.
+// Everything is denied to an unknown caller, which no set of ids can express: such a request fails.
 void RequireSomebody(int profile_id) {
     if (profile_id == 0) {
         throw std::runtime_error("the rights of an account that is unknown were asked for");
@@ -134,7 +134,7 @@ std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool) const {
     return denied == m_pData->denied_cameras.end() ? std::set<int>{} : denied->second;
 }
 
-// These are asked for by few; a store that fails is their failure too.
+// Few requests ask for these, so they are read on demand; an exception of the store ends the request.
 std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
     return IsUser(m_pData->id) ? Users().DeniedGroups(m_pData->id, static_cast<store::CameraAccess>(type))
                                : std::set<int>{};
@@ -188,7 +188,7 @@ PrivProfile PrivProfileGetByUid(unsigned int uid) {
             data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
             if (uid == RequestContext::Current().Caller()) {
                 data->denied_cameras[static_cast<int>(kind)].merge(
-                    std::set(RequestContext::Current().RenouncedCameras()));
+                    std::set(RequestContext::Current().CamerasDeniedByRequest()));
             }
         }
         return PrivProfile(data);

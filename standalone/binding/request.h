@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What stands behind the request and the response that the module is given; the host fills the one and reads the other.
+// The state behind the request and response objects that the module is given; the host fills the one, reads the other.
 #pragma once
 
 #include <map>
@@ -16,7 +16,7 @@
 
 namespace lookhaven::binding {
 
-// The application that an account here may use, every account.
+// The one application; every account may use it.
 constexpr const char* kApplication = "VEXO.VDX.Lookhaven";
 
 struct Login {

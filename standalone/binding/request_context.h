@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the platform knows of the one request that this process serves.
+// The one request that this process serves: its caller, what the caller was granted, its store and its output.
 //
 // Why so        The module asks for a ring or a camera without saying on whose behalf, so who the caller is must be known
 //               to the whole process. A request process serves one request, hence one context.
@@ -23,9 +23,9 @@
 
 namespace lookhaven::binding {
 
-// What the host wants to hear of while the module works.
+// What the host is told while the module works.
 struct RequestEvents {
-    // Once, when it turns out that the answer is a stream: such a request may take its time.
+    // Once, when it turns out that the answer is a stream: it has no deadline.
     std::function<void()> on_stream = [] {};
     // The process plays recordings, reachable under the client's stream key; its player file is written.
     std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
@@ -49,7 +49,8 @@ class LH_PLATFORM_API RequestContext {
 
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
-    // A stream may run for weeks and would hold on to the store; whoever starts to send or to wait closes it.
+    // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever is
+    // about to send or to wait calls this; references from Records are invalid afterwards.
     void CloseRecords();
 
     // The caller: a user's id, PAIR_AUTH_UID for a peer, 0 for nobody.
@@ -58,15 +59,15 @@ class LH_PLATFORM_API RequestContext {
     // The handle of the caller's session; empty when there is none.
     const std::string& Session() const { return session_; }
     void SetSession(const std::string& handle) { session_ = handle; }
-    // Cameras that the request itself gives up, whatever the caller may see, and such whose sound alone it gives up.
-    const std::set<int>& RenouncedCameras() const { return renounced_cameras_; }
-    const std::set<int>& RenouncedSound() const { return renounced_sound_; }
-    void Renounce(std::set<int> cameras, std::set<int> sound = {}) {
-        renounced_cameras_ = std::move(cameras);
-        renounced_sound_ = std::move(sound);
+    // What the request's "privData" takes away from the caller's rights: cameras, and cameras whose sound alone.
+    const std::set<int>& CamerasDeniedByRequest() const { return cameras_denied_by_request_; }
+    const std::set<int>& SoundDeniedByRequest() const { return sound_denied_by_request_; }
+    void RestrictByPrivData(std::set<int> cameras, std::set<int> sound = {}) {
+        cameras_denied_by_request_ = std::move(cameras);
+        sound_denied_by_request_ = std::move(sound);
     }
 
-    // The live stream that the caller was found to be allowed, and whether its sound is too.
+    // The live stream that the caller has been granted, and whether with its sound.
     const std::optional<control::LiveStream>& GrantedStream() const { return granted_; }
     bool MayHear() const { return may_hear_; }
     void GrantStream(control::LiveStream stream, bool may_hear) {
@@ -74,7 +75,7 @@ class LH_PLATFORM_API RequestContext {
         may_hear_ = may_hear;
     }
 
-    // The answer is a stream: it may last.
+    // The answer is a stream, which may run for as long as the client likes.
     void NoteStream();
     void NotePlayer(std::int64_t key) { events_.on_player(key); }
     // The answer is a picture, alone or in a stream.
@@ -92,8 +93,8 @@ class LH_PLATFORM_API RequestContext {
     std::unique_ptr<store::Store> records_;
     unsigned int caller_ = 0;
     std::string session_;
-    std::set<int> renounced_cameras_;
-    std::set<int> renounced_sound_;
+    std::set<int> cameras_denied_by_request_;
+    std::set<int> sound_denied_by_request_;
     std::optional<control::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;
@@ -104,8 +105,8 @@ class LH_PLATFORM_API RequestContext {
 // Writes "name: what" to the log.
 void LogFailure(const char* name, const std::exception& error);
 
-// Runs ask; what it throws is logged under the name and answered by failure. For calls that the module can only see
-// fail or succeed.
+// The result of ask, or failure when it throws; the exception is logged under the name. For calls that can tell the
+// module nothing but success or failure.
 template <typename Result, typename Ask>
 Result OrFailure(const char* name, Result failure, Ask&& ask) {
     try {

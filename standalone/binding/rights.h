@@ -2,8 +2,8 @@
 //
 // What the caller of this request process may do with a camera, or see of an e-map, a door or an I/O module.
 //
-// Why so        The module's handlers filter what they show, not all of them everything. So the platform asks here before it
-//               opens anything of a camera.
+// Why so        Not every handler of the module filters all that it shows. So the platform checks here before it opens
+//               anything of a camera.
 #pragma once
 
 #include <set>
@@ -22,7 +22,7 @@ LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
 // Likewise the cameras whose sound alone they deny.
 LH_PLATFORM_API std::set<int> SoundDeniedBy(const Json::Value& priv_data);
 
-// False for a camera that is denied to the caller or that the request renounces, and for nobody as the caller. Throws
+// False for a camera that is denied to the caller or that the request's "privData" denies, and for nobody as the caller. Throws
 // store::StoreError.
 LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
 

@@ -75,8 +75,8 @@ std::string SlaveHx::GetCookie() const {
     return m_Cookie;
 }
 
-// The cookie is "<timestamp>-<token>": a client that asks the server itself sends the two apart. Whoever has it may see all of
-// that server for as long as it is good, so nobody gets one but those who administer this host; others have it relayed.
+// The cookie is "<timestamp>-<token>": a client that asks the server itself sends the two apart. While it is valid it opens
+// all of that server's cameras, so only managers of this host get one; other callers use the relay.
 SlaveHxMgr::SlaveHxMgr(bool load) {
     if (!load) {
         return;
@@ -96,7 +96,7 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
     });
 }
 
-// This host does not watch its servers: one that is enabled counts as one that answers, and as of its own version.
+// This host does not monitor its servers: an enabled one is reported as online, and as of this host's version.
 std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabled, bool onlySameVersion) const {
     std::map<int, SlaveHx> servers = m_Servers;
     if (onlyOnline || onlyEnabled || onlySameVersion) {
@@ -107,7 +107,7 @@ std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabl
     return servers;
 }
 
-// Whoever knows a secret of this host is the peer from here on, whatever session came along.
+// A caller with a valid pair token is the paired host from here on, whatever session came along.
 bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
     return OrFailure("IsAuthPairMatch", false, [&] {
         const std::int64_t now = UtcSeconds();

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The request processes that are running, and the road on which each of them leaves.
+// The running request processes, and how each of them is ended.
 //
-// Why so        A module's stream looks at a flag and then waits: a signal between the two goes unseen. So a process that
-//               is to leave gets SIGTERM again and again, and SIGKILL when it does not go.
+// Why so        A module's stream tests a flag and then waits: a signal between the two goes unseen. So a process that is
+//               to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
 //               (3) A player is asked to look at its player file only while that names another one of its session.
@@ -53,9 +53,9 @@ class ProcessTable {
     void LeaveAll();
     // Those whose session or player has ended.
     void LeaveEnded();
-    // Players are to be looked at: one is new, or something is wanted of one.
+    // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
-    // Takes in that the process has ended.
+    // The process has ended: sweeps what it left and frees its slot.
     void Reap(pid_t pid);
 
     // Sends what is due; returns when to come again.

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Takes one SCGI request apart as its bytes arrive.
+// Parses one SCGI request as its bytes arrive.
 //
 // Format        <decimal length>:<name> NUL <value> NUL … ,<body>. The first name is CONTENT_LENGTH, and SCGI is "1".
 // Invariants    (1) Never keeps more than the two limits and one chunk, whatever a client sends.

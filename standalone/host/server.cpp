@@ -117,7 +117,7 @@ void Server::Accept() {
     base::FileDescriptor socket(::accept4(listener_.Get(), nullptr, nullptr, SOCK_CLOEXEC));
     if (!socket) {
         if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == ENOBUFS) {
-            base::LogError("cannot take a connection in: too little memory or too many files are open");
+            base::LogError("cannot accept a connection: out of memory, or too many open files");
             Watch(listener_.Get(), Kind::kListener, 0, 0);
             accept_due_ = Clock::now() + kAcceptAgain;
         }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The host's loop: takes requests in, starts a process for each, watches connections and processes.
+// The host's event loop: accepts requests, starts a process for each, watches connections and processes.
 //
 // Invariants    (1) Nothing here waits for a client or a process.
 //               (2) The store, a ring or libav is never opened in this process: a fork would break it.

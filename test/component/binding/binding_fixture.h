@@ -43,7 +43,7 @@ class Binding : public testing::Test {
         context.CloseRecords();
         context.Begin(*home_, nullptr);
         context.SetCaller(user);
-        context.Renounce({});
+        context.RestrictByPrivData({});
     }
     static std::string Picture(JpegExtractor& extractor, int index, int size = 100) {
         std::string buffer(static_cast<std::size_t>(size), '\0');

@@ -180,7 +180,7 @@ TEST_F(EmapBinding, EachProfileIsDeniedItsOwn) {
     EXPECT_THROW(nobody.GetInaEmapIdSet(ITEM_PRIV_VIEW, false), std::runtime_error) << "or nothing would be denied";
     EXPECT_THROW(nobody.GetInaIOIdSet(false), std::runtime_error);
     EXPECT_THROW(nobody.GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), std::runtime_error);
-    RequestContext::Current().Renounce({7});
+    RequestContext::Current().RestrictByPrivData({7});
     EXPECT_THAT(PrivProfileGetByUid(1).GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), ElementsAre(7));
     const struct {
         unsigned int user;

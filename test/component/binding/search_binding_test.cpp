@@ -39,7 +39,7 @@ TEST_F(Binding, RefusesWhatTheCallerMayNotPlayBack) {
                           {"an account that is gone", 77, {}, false}};
     for (const Case& each : cases) {
         Call(each.caller);
-        RequestContext::Current().Renounce(each.renounced);
+        RequestContext::Current().RestrictByPrivData(each.renounced);
         const int refused = each.sees ? 0 : -1;
         EXPECT_EQ(Event().Load(event, 0, 0, 0), refused) << each.who;
         EXPECT_EQ(AlertEvent().Load(alert, 0, 0, 0), refused) << each.who;
