@@ -12,6 +12,7 @@ namespace {
 // Looks at its callers itself; every other API of a module needs a session.
 constexpr const char* kSelfAdmittingApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
+// A GET has effects too: it starts streams, costs work, and plays sound.
 bool IsCrossSite(const http::Request& request) {
     if (const std::string_view site = request.Header("HTTP_SEC_FETCH_SITE"); !site.empty()) {
         return site != "same-origin" && site != "none";
@@ -31,7 +32,7 @@ void CheckOrigin(const http::Request& request) {
     if (method != "GET" && method != "POST") {
         throw Failure(405, "GET and POST only");
     }
-    if (method == "POST" && IsCrossSite(request)) {
+    if (IsCrossSite(request)) {
         throw Failure(403, "another site's page may not ask for this");
     }
 }
@@ -52,8 +53,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
                           session->user.IsManager()};
 }
 
-void Admit(Call& call, std::size_t max_requests) {
-    call.login = FindLogin(call);
+void Admit(const Call& call, std::size_t max_requests) {
     const Json::Value& priv_data = call.Parameter("privData");
     call.context.RestrictByPrivData(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
     if (!call.login) {

@@ -12,14 +12,14 @@ namespace lookhaven::api {
 
 constexpr const char* kSessionCookie = "id";  // carries the session's secret
 
-// Throws Failure 405 for another method than GET and POST, 403 for a POST that another site's page made a browser send.
+// Throws Failure 405 for another method than GET and POST, 403 for a request that another site's page made a browser send.
 void CheckOrigin(const http::Request& request);
 
 // The live session of the call's cookie, noted as in use; nothing when there is none. Throws store::StoreError.
 std::optional<binding::Login> FindLogin(const Call& call);
 
-// Makes the session of the call's cookie the caller of this process, and narrows its rights by "privData". Throws Failure
+// Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure
 // 401 without a session, except at the API that admits by itself; 503 when max_requests of the session run already.
-void Admit(Call& call, std::size_t max_requests);
+void Admit(const Call& call, std::size_t max_requests);
 
 }  // namespace lookhaven::api

@@ -34,6 +34,10 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
 
 std::string LogIn(const Call& call) {
     store::Store& records = call.Records();
+    const Parameters query = ReadQuery(call.request);
+    if (query.contains("account") || query.contains("password")) {
+        throw Failure(400, "account and password belong into the body: addresses end up in logs and histories");
+    }
     const std::string account = call.Parameter("account").asString();
     const std::string_view address = call.request.Header("REMOTE_ADDR");
     store::LoginThrottle throttle(records);
@@ -50,21 +54,20 @@ std::string LogIn(const Call& call) {
                          CookieLine(call.request, session.secret));
 }
 
-binding::Login RequireLogin(const Call& call) {
-    const auto login = FindLogin(call);
-    if (!login) {
+const binding::Login& RequireLogin(const Call& call) {
+    if (!call.login) {
         throw Failure(401, "no session");
     }
-    return *login;
+    return *call.login;
 }
 
 std::string Status(const Call& call) {
-    const binding::Login login = RequireLogin(call);
+    const binding::Login& login = RequireLogin(call);
     return SuccessAnswer(Identity(call.Records(), login.account, static_cast<int>(login.user_id), login.is_manager));
 }
 
 std::string LogOut(const Call& call) {
-    const binding::Login login = RequireLogin(call);
+    const binding::Login& login = RequireLogin(call);
     store::Sessions(call.Records()).End(login.session_handle);
     call.slots.EndSession(login.session_handle);
     return SuccessAnswer(Json::nullValue, CookieLine(call.request, "; Max-Age=0"));

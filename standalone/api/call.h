@@ -28,7 +28,7 @@ struct Call {
     std::string method;
     Parameters parameters;
     std::map<std::string, std::string> cookies;
-    std::optional<binding::Login> login;  // of the cookie's session; looked up for APIs that need one
+    std::optional<binding::Login> login;  // of the cookie's session
 
     binding::RequestContext& context;
     control::SlotTable& slots;

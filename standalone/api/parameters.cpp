@@ -12,6 +12,8 @@ namespace lookhaven::api {
 
 namespace {
 
+constexpr std::size_t kMaxParameters = 300;
+
 // Cuts the text at the first separator; returns what stands before it.
 std::string_view CutFront(std::string_view& text, char separator) {
     const std::size_t end = std::min(text.find(separator), text.size());
@@ -70,17 +72,36 @@ std::string Unescape(std::string_view text) {
     return plain;
 }
 
-void ReadForm(std::string_view form, Parameters& parameters) {
-    while (!form.empty()) {
-        std::string_view value = CutFront(form, '&');
-        const std::string name = Unescape(CutFront(value, '='));
-        if (!name.empty()) {
-            parameters[name] = binding::JsonFromText(name, Unescape(value));
-        }
+bool NamesMethod(const std::string& name) {
+    return name == "api" || name == "version" || name == "method";
+}
+
+void Add(std::string name, Json::Value value, Parameters& parameters) {
+    const bool is_new = parameters.insert_or_assign(name, std::move(value)).second;
+    if (!is_new && NamesMethod(name)) {
+        throw http::Failure(400, "the parameter " + name + " is named twice");
+    }
+    if (parameters.size() > kMaxParameters) {
+        throw http::Failure(400, "the request has more than " + std::to_string(kMaxParameters) + " parameters");
     }
 }
 
-void ReadJson(const std::string& body, Parameters& parameters) {
+Parameters ReadForm(std::string_view form) {
+    Parameters parameters;
+    for (std::size_t pairs = 0; !form.empty(); ++pairs) {
+        if (pairs >= kMaxParameters) {
+            throw http::Failure(400, "the request has more than " + std::to_string(kMaxParameters) + " parameters");
+        }
+        std::string_view value = CutFront(form, '&');
+        const std::string name = Unescape(CutFront(value, '='));
+        if (!name.empty()) {
+            Add(name, binding::JsonFromText(name, Unescape(value)), parameters);
+        }
+    }
+    return parameters;
+}
+
+Parameters ReadJson(const std::string& body) {
     Json::CharReaderBuilder builder;
     Json::CharReaderBuilder::strictMode(&builder.settings_);
     const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
@@ -89,32 +110,38 @@ void ReadJson(const std::string& body, Parameters& parameters) {
     if (!IsText(body) || !reader->parse(body.data(), body.data() + body.size(), &root, nullptr) || !root.isObject()) {
         throw http::Failure(400, "the body is not a JSON object");
     }
+    Parameters parameters;
     for (const std::string& name : root.getMemberNames()) {
         if (binding::IsAlwaysText(name) && !root[name].isString()) {
             throw http::Failure(400, "the parameter " + name + " is not a text");
         }
-        parameters[name] = root[name];
+        Add(name, root[name], parameters);
     }
+    return parameters;
 }
 
 }  // namespace
 
-Parameters ReadParameters(const http::Request& request) {
-    Parameters parameters;
-    ReadForm(request.Header("QUERY_STRING"), parameters);
+Parameters ReadQuery(const http::Request& request) {
+    return ReadForm(request.Header("QUERY_STRING"));
+}
+
+void AddBody(const http::Request& request, Parameters& parameters) {
     if (request.Header("REQUEST_METHOD") != "POST" || request.body.empty()) {
-        return parameters;
+        return;
     }
     std::string_view rest = request.Header("CONTENT_TYPE");
     const std::string_view type = Trim(CutFront(rest, ';'));
-    if (type == "application/json") {
-        ReadJson(request.body, parameters);
-    } else if (type == "application/x-www-form-urlencoded") {
-        ReadForm(request.body, parameters);
-    } else {
+    if (type != "application/json" && type != "application/x-www-form-urlencoded") {
         throw http::Failure(400, "the body is neither a form nor JSON");
     }
-    return parameters;
+    const bool query_names_api = parameters.contains("api");
+    for (auto& [name, value] : type == "application/json" ? ReadJson(request.body) : ReadForm(request.body)) {
+        if (NamesMethod(name) && (query_names_api || parameters.contains(name))) {
+            throw http::Failure(400, "the parameter " + name + " belongs into the address, once");
+        }
+        Add(name, value, parameters);
+    }
 }
 
 std::map<std::string, std::string> ReadCookies(const http::Request& request) {

@@ -19,6 +19,7 @@ namespace lookhaven::api {
 namespace {
 
 constexpr rlim_t kMaxAddressSpace = rlim_t{1} << 30;
+constexpr std::size_t kMaxBodyWithoutSession = 4096;
 
 // Under a sanitizer a process maps terabytes before main.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -35,16 +36,22 @@ void LimitAddressSpace(bool limited) {
     }
 }
 
+// Cookie and session come first: nobody without a session may cost more than a short request.
 Call ReadCall(const http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     Call call{.request = request,
               .api = {},
               .method = {},
-              .parameters = ReadParameters(request),
+              .parameters = ReadQuery(request),
               .cookies = ReadCookies(request),
               .login = {},
               .context = binding::RequestContext::Current(),
               .slots = slots,
               .slot = slot};
+    call.login = FindLogin(call);
+    if (!call.login && request.body.size() > kMaxBodyWithoutSession) {
+        throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401, "no session, and so only a short body");
+    }
+    AddBody(request, call.parameters);
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
     call.method = call.Parameter("method").asString();

@@ -26,10 +26,22 @@ namespace lookhaven::binding {
 
 namespace {
 
+// A restriction that is not understood cannot be applied, so the request must fail rather than go on unrestricted.
+void RequireKnownShape(const Json::Value& priv_data) {
+    const std::set<std::string> known = {"privilege", "deniedCameras", "deniedAudio"};
+    for (const std::string& member : priv_data.getMemberNames()) {  // throws for what is no object
+        const bool fits = member == "privilege" ? priv_data[member].isInt() : priv_data[member].isArray();
+        if (!known.contains(member) || !fits) {
+            throw Json::LogicError("privData has a member that is not known or of the wrong type: " + member);
+        }
+    }
+}
+
 std::set<int> IdsUnder(const Json::Value& priv_data, const char* member) {
     std::set<int> cameras;
     if (!priv_data.isNull()) {
-        for (const Json::Value& camera : priv_data.get(member, Json::arrayValue)) {
+        RequireKnownShape(priv_data);
+        for (const Json::Value& camera : priv_data[member]) {
             cameras.insert(camera.asInt());
         }
     }
@@ -159,6 +171,7 @@ void PrivProfile::UpdateByJson(const Json::Value& privData) {
     if (privData.isNull()) {
         return;
     }
+    lookhaven::binding::CamerasDeniedBy(privData);  // throws before anything is applied
     auto narrowed = std::make_shared<Data>(*m_pData);
     narrowed->privilege = std::max(narrowed->privilege, privData.get("privilege", 0).asInt());
     for (const int camera : lookhaven::binding::CamerasDeniedBy(privData)) {

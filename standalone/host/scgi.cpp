@@ -74,8 +74,13 @@ void ScgiParser::ParseHead() {
         if (request_.headers.empty() != (name == "CONTENT_LENGTH")) {
             return Fail("CONTENT_LENGTH is not first, or twice");
         }
-        if (!request_.headers.emplace(name, rest.substr(name_end + 1, value_end - name_end - 1)).second) {
+        const std::string_view value = rest.substr(name_end + 1, value_end - name_end - 1);
+        const auto [line, is_new] = request_.headers.emplace(name, value);
+        if (!is_new && !name.starts_with("HTTP_")) {
             return Fail("the request's head names a line twice");
+        }
+        if (!is_new) {  // a header that the client, or a proxy, sent in several lines
+            line->second.append(name == "HTTP_COOKIE" ? "; " : ", ").append(value);
         }
         rest.remove_prefix(value_end + 1);
     }

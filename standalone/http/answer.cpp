@@ -11,7 +11,7 @@ namespace lookhaven::http {
 namespace {
 
 const char* Reason(int status) {
-    constexpr std::array<std::pair<int, const char*>, 13> kReasons{{{200, "OK"},
+    constexpr std::array<std::pair<int, const char*>, 14> kReasons{{{200, "OK"},
                                                                     {400, "Bad Request"},
                                                                     {401, "Unauthorized"},
                                                                     {403, "Forbidden"},
@@ -19,6 +19,7 @@ const char* Reason(int status) {
                                                                     {405, "Method Not Allowed"},
                                                                     {408, "Request Timeout"},
                                                                     {409, "Conflict"},
+                                                                    {413, "Content Too Large"},
                                                                     {429, "Too Many Requests"},
                                                                     {500, "Internal Server Error"},
                                                                     {502, "Bad Gateway"},

@@ -24,6 +24,12 @@ http::Request Post(const std::string& query, const std::string& type, const std:
     return {{{"REQUEST_METHOD", "POST"}, {"QUERY_STRING", query}, {"CONTENT_TYPE", type}}, body};
 }
 
+Parameters ReadParameters(const http::Request& request) {
+    Parameters parameters = ReadQuery(request);
+    AddBody(request, parameters);
+    return parameters;
+}
+
 Json::Value Param(const http::Request& request, const std::string& name, const Json::Value& fallback) {
     VEXO::APIRequest::Context context;
     context.parameters = ReadParameters(request);
@@ -99,7 +105,12 @@ TEST(Parameters, ComeFromQueryFormAndJson) {
 
 TEST(Parameters, RefusesBrokenOnes) {
     const std::string json = "application/json";
+    const std::string form = "application/x-www-form-urlencoded";
     const std::string nested(100'000, '[');
+    std::string many;
+    for (int i = 0; i <= 300; ++i) {
+        many += "p" + std::to_string(i) + "=1&";
+    }
     const http::Request cases[] = {
         Get("p=%"),
         Get("p=%4"),
@@ -118,6 +129,17 @@ TEST(Parameters, RefusesBrokenOnes) {
         Post("", json, "{\"password\":12345678}"),
         Post("", "text/plain", "p=1"),
         Post("", json, nested),
+        // The web server must see the api that is served: named once, and in the address where that names any.
+        Get("api=VEXO.Event&api=VEXO.Auth"),
+        Get("api=VEXO.Event&%61pi=VEXO.Auth"),
+        Get("api=VEXO.Event&method=Mark&metho%64=Login"),
+        Post("api=VEXO.Event", form, "api=VEXO.Auth"),
+        Post("api=VEXO.Event", json, "{\"api\":\"VEXO.Auth\"}"),
+        Post("api=VEXO.Event", form, "method=Login"),
+        Post("method=Mark", form, "api=VEXO.Auth&method=Login"),
+        Post("", form, "api=VEXO.Event&%61pi=VEXO.Auth"),
+        Get(many),
+        Post("", form, many),
     };
     for (const http::Request& request : cases) {
         bool refused = false;

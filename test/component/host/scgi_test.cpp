@@ -119,6 +119,11 @@ TEST(Scgi, RefusesWhatIsNotARequest) {
                    "0\0SCGI\0"
                    "2\0"s),
          State::kMalformed},
+        {"a header in two lines",
+         Netstring(kStart + "HTTP_A\0"
+                            "1\0HTTP_A\0"
+                            "2\0"s),
+         State::kComplete},
         {"a name twice",
          Netstring(kStart + "A\0"
                             "1\0A\0"
