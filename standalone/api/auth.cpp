@@ -1,6 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // VEXO.Auth: log in, log out, who am I.
+#include <algorithm>
+
+#include <arpa/inet.h>
+
 #include "standalone/api/admit.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
@@ -32,6 +36,17 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
     return data;
 }
 
+// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
+std::string NetworkOf(std::string_view address) {
+    in6_addr bytes{};
+    if (::inet_pton(AF_INET6, std::string(address).c_str(), &bytes) != 1 || IN6_IS_ADDR_V4MAPPED(&bytes)) {
+        return std::string(address);
+    }
+    std::fill(std::begin(bytes.s6_addr) + 8, std::end(bytes.s6_addr), std::uint8_t{0});
+    char text[INET6_ADDRSTRLEN];
+    return std::string(::inet_ntop(AF_INET6, &bytes, text, sizeof text)) + "/64";
+}
+
 std::string LogIn(const Call& call) {
     store::Store& records = call.Records();
     const Parameters query = ReadQuery(call.request);
@@ -39,7 +54,7 @@ std::string LogIn(const Call& call) {
         throw Failure(400, "account and password belong into the body: addresses end up in logs and histories");
     }
     const std::string account = call.Parameter("account").asString();
-    const std::string_view address = call.request.Header("REMOTE_ADDR");
+    const std::string address = NetworkOf(call.request.Header("REMOTE_ADDR"));
     store::LoginThrottle throttle(records);
     if (const int wait_s = throttle.Enter(account, address, NowSeconds()); wait_s > 0) {
         throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds");

@@ -6,6 +6,7 @@
 #include <string>
 
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include "standalone/base/log.h"
@@ -15,6 +16,18 @@ namespace lookhaven::host {
 namespace {
 
 constexpr int kWakeDescriptor = 3;
+
+// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range.
+void CloseFrom(int first) {
+    if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
+        return;
+    }
+    rlimit limit{};
+    ::getrlimit(RLIMIT_NOFILE, &limit);
+    for (int descriptor = first; descriptor < static_cast<int>(limit.rlim_cur); ++descriptor) {
+        ::close(descriptor);
+    }
+}
 
 }  // namespace
 
@@ -28,7 +41,7 @@ void LeaveHost(pid_t host, control::SlotTable& slots, int standard_output) {
     }
     ::dup2(slots.WakeDescriptor(), kWakeDescriptor);
     slots.SetWakeDescriptor(kWakeDescriptor);
-    ::close_range(kWakeDescriptor + 1, ~0U, 0);
+    CloseFrom(kWakeDescriptor + 1);
     for (int number = 1; number < NSIG; ++number) {
         std::signal(number, SIG_DFL);
     }

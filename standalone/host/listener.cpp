@@ -39,6 +39,11 @@ base::FileDescriptor NewSocket() {
     return base::FileDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
 }
 
+std::optional<std::pair<dev_t, ino_t>> FileAt(const std::filesystem::path& path) {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0 ? std::optional(std::pair(status.st_dev, status.st_ino)) : std::nullopt;
+}
+
 }  // namespace
 
 void OpenStandardDescriptors() {
@@ -72,10 +77,11 @@ Listener::Listener(const std::filesystem::path& path) {
         base::ThrowErrno("cannot listen on " + path.string());
     }
     path_ = path;
+    file_ = FileAt(path);
 }
 
 Listener::~Listener() {
-    if (!path_.empty()) {
+    if (!path_.empty() && file_ && FileAt(path_) == file_) {
         ::unlink(path_.c_str());
     }
 }

@@ -4,7 +4,11 @@
 #pragma once
 
 #include <filesystem>
+#include <optional>
 #include <string>
+#include <utility>
+
+#include <sys/types.h>
 
 #include "standalone/base/file_descriptor.h"
 
@@ -28,7 +32,8 @@ class Listener {
 
   private:
     base::FileDescriptor socket_;
-    std::filesystem::path path_;  // of its own socket file
+    std::filesystem::path path_;                   // of its own socket file
+    std::optional<std::pair<dev_t, ino_t>> file_;  // the file that was made there; a successor may have replaced it
 };
 
 }  // namespace lookhaven::host

@@ -171,6 +171,10 @@ class ApiTest(unittest.TestCase):
                 self.assertEqual(server.request(query, form=form).status, 429, query)
             wait_until(lambda: server.request(LOGIN, form=form).status == 401, 5, "a log-in is let through again")
 
+    def test_plain_http_is_for_this_machine_by_its_own_names(self):
+        for host, status in (("localhost", 200), ("127.0.0.1:8080", 200), ("rebound.example", 421)):
+            self.assertEqual(self.server.request(STATUS, "admin", headers={"Host": host}).status, status, host)
+
     def test_no_query_string_in_any_log(self):
         self.server.request({**STATUS, "remark": "sesame-open"}, "admin")
         self.server.request("api=%zz&remark=sesame-open" + "a" * 9000)

@@ -39,7 +39,7 @@ class StreamTest(unittest.TestCase):
 
     def test_a_thousand_cut_connections_leave_nothing_behind(self):
         dice = random.Random(20260301)
-        head = f"Host: x\r\nConnection: close\r\nCookie: id={self.server.session('admin')}\r\n\r\n"
+        head = f"Host: localhost\r\nConnection: close\r\nCookie: id={self.server.session('admin')}\r\n\r\n"
         load = "/webapi?api=VEXO.Lookhaven.Player&version=1&method=LoadCamera"
         plans = [
             (f"GET {dice.choice([PLAY + '1', PLAY + '4', PLAY + '1&snapshot=1', load])} HTTP/1.1\r\n{head}".encode(),

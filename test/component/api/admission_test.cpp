@@ -48,6 +48,19 @@ TEST_F(Admission, OnlyASessionMayCostMuch) {
     EXPECT_EQ(Status(success, true, "p=" + large.substr(2)), 200);
 }
 
+TEST_F(Admission, AnIpv6NetworkCountsAsOneAddress) {
+    const auto attempt = [this](const std::string& address) {
+        return Status("api=VEXO.Auth&version=1&method=Login", false, "account=admin&password=wrong",
+                      {{"REMOTE_ADDR", address}});
+    };
+    for (int i = 0; i < 5; ++i) {
+        EXPECT_EQ(attempt("2001:db8:0:1:" + std::to_string(i) + "::1"), 401);
+    }
+    EXPECT_EQ(attempt("2001:db8:0:1:ffff::1"), 429);
+    EXPECT_EQ(attempt("2001:db8:0:2::1"), 401) << "another network";
+    EXPECT_EQ(attempt("::ffff:192.0.2.1"), 401) << "an IPv4 address in IPv6 form";
+}
+
 TEST_F(Admission, OtherSitesMayNotAsk) {
     const std::string success = "api=Test&version=1&method=Success";
     for (const std::string& body : {std::string(), std::string("p=1")}) {
