@@ -34,7 +34,7 @@ int Run(int camera, const std::string& codec, std::size_t frame_bytes, int frame
     estimate.largest_frame_bytes = static_cast<std::int64_t>(frame_bytes);
     estimate.bits_per_second = estimate.largest_frame_bytes * 8 * frames_per_second;
     estimate.frames_per_second = frames_per_second;
-    ring::Writer writer(installation, {camera, 0, ring::Medium::kVideo}, format, ring::GeometryFor(estimate));
+    ring::Writer writer(installation, {camera, 0, base::Medium::kVideo}, format, ring::GeometryFor(estimate));
 
     std::vector<char> picture = bench::MakeFrame(frame_bytes);
     ring::Frame frame;

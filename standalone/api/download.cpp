@@ -7,7 +7,7 @@
 
 #include <unistd.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
@@ -86,7 +86,7 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     call.context.CloseRecords();
     call.context.NoteStream();
     // Checked while an error answer is still possible.
-    if (archive::Recording(path).FrameCount() == 0) {
+    if (archive::RecordingReader(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }
     const media::RemuxLibrary& library = media::LoadRemuxLibrary();

@@ -7,7 +7,7 @@
 
 namespace lookhaven::archive {
 
-// The file is damaged, foreign or empty, said in one sentence. That it cannot be opened or read at all is a
+// The file is damaged, empty or none of ours; what() is one sentence. A file that cannot be opened or read at all is a
 // std::system_error instead.
 class ArchiveError : public std::runtime_error {
   public:

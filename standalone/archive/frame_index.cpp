@@ -14,6 +14,7 @@
 
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
@@ -26,7 +27,7 @@ constexpr std::uint32_t kVersion = 1;
 constexpr std::uint32_t kKeyFlag = 1;
 constexpr int kMaxSidePixels = 16384;
 constexpr std::int64_t kMaxWallMs = 253'402'300'800'000;  // the year 10000
-constexpr std::uint32_t kMaxTimeMs = (kMaxRecordingSeconds + 60) * 1000;
+constexpr std::uint32_t kMaxTimeMs = (base::kMaxRecordingSeconds + 60) * 1000;
 
 struct RawHeader {
     std::array<char, 8> magic = kMagic;
@@ -39,7 +40,7 @@ struct RawHeader {
     std::array<char, 8> codec{};
     std::array<char, 8> audio_codec{};
     std::array<std::uint8_t, 11> unused{};
-    std::uint8_t finished = 0;  // outside the checksum, since it changes under the eyes of readers
+    std::uint8_t finished = 0;  // outside the checksum, since it changes while readers look
 };
 static_assert(sizeof(RawHeader) == 64 && offsetof(RawHeader, finished) == 63);
 
@@ -54,7 +55,7 @@ static_assert(sizeof(RawEntry) == 24);
 
 constexpr off_t kMaxFileBytes = sizeof(RawHeader) + off_t{sizeof(RawEntry)} * kMaxTimeMs;
 
-// FNV-1a by words, stirred: any one changed word or byte changes it, and it is not 0 for zeros.
+// FNV-1a by words with extra mixing: any changed word or byte changes it, and it is not 0 for zeros.
 std::uint32_t Checksum(const void* data, std::size_t size) {
     const auto* bytes = static_cast<const std::uint8_t*>(data);
     std::uint32_t sum = 2'166'136'261U;
@@ -103,7 +104,7 @@ void WriteAll(int file, const void* data, std::size_t size, std::uint64_t at, co
     }
 }
 
-// How much of the buffer the file could fill.
+// Returns how many bytes were read: fewer than size at the end of the file.
 std::size_t ReadUpTo(int file, void* buffer, std::size_t size, std::uint64_t at, const std::string& path) {
     std::size_t done = 0;
     while (done < size) {
@@ -143,9 +144,9 @@ std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms) {
     if (frame_count == 0) {
         return 0;
     }
-    constexpr std::int64_t kLongestMs = 1000;
-    const std::int64_t period_ms = frame_count > 1 ? last_time_ms / (frame_count - 1) : kLongestMs;
-    return last_time_ms + std::clamp<std::int64_t>(period_ms, 1, kLongestMs);
+    constexpr std::int64_t kMaxPeriodMs = 1000;
+    const std::int64_t period_ms = frame_count > 1 ? last_time_ms / (frame_count - 1) : kMaxPeriodMs;
+    return last_time_ms + std::clamp<std::int64_t>(period_ms, 1, kMaxPeriodMs);
 }
 
 FrameIndexWriter::FrameIndexWriter(const std::filesystem::path& path, const IndexHeader& header)
@@ -160,7 +161,7 @@ FrameIndexWriter::FrameIndexWriter(const std::filesystem::path& path, const Inde
     raw.audio_codec = Name(header.audio_codec);
     raw.check = CheckOf(raw);
     try {
-        // This kind of lock belongs to the open file, not to the process, and some systems of files know none.
+        // This kind of lock belongs to the open file, not to the process; some file systems do not support it.
         struct flock lock = WholeFile(F_WRLCK);
         if (::fcntl(file_.Get(), F_OFD_SETLK, &lock) != 0) {
             base::ThrowErrno("cannot lock " + path_);
@@ -183,7 +184,7 @@ void FrameIndexWriter::Append(std::span<const FrameEntry> entries) {
     try {
         WriteAll(file_.Get(), raw.data(), raw.size() * sizeof(RawEntry), size_bytes_, path_);
     } catch (...) {
-        // Should this fail too, the torn entry is passed over by readers.
+        // Should this fail too, readers ignore the torn entry.
         [[maybe_unused]] const int result = ::ftruncate(file_.Get(), static_cast<off_t>(size_bytes_));
         throw;
     }
@@ -234,9 +235,9 @@ void FrameIndexReader::ReadNew(std::uint64_t recording_bytes, std::vector<FrameE
                 torn = true;
                 continue;
             }
-            const bool usable = raw.size > 0 && raw.size <= kMaxFrameBytes && raw.offset < (std::uint64_t{1} << 62) &&
-                                raw.offset >= frames_end_ && raw.time_ms <= kMaxTimeMs &&
-                                (frames_end_ > 0 || (raw.flags & kKeyFlag) != 0);
+            const bool usable = raw.size > 0 && raw.size <= base::kMaxFrameBytes &&
+                                raw.offset < (std::uint64_t{1} << 62) && raw.offset >= frames_end_ &&
+                                raw.time_ms <= kMaxTimeMs && (frames_end_ > 0 || (raw.flags & kKeyFlag) != 0);
             if (torn || !usable) {
                 throw ArchiveError(path_ + " is damaged");
             }

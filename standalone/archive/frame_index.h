@@ -1,13 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The list of a recording's frames beside the recording, so that any frame is found without reading what is before it.
+// The list of a recording's frames in a file of its own, so that any frame is found without reading those before it.
 //
-// Format        A header of 64 bytes, then 24 bytes a frame in the order of the file, which is the order of decoding; all
-//               little endian. Header and entries each carry a checksum. The header's last byte is 1 once the recording
-//               is finished.
-// Crash rule    An entry is appended after its frame is in the recording. A torn entry at the end is as good as none.
-//               Until it finishes, the writer holds a lock on the file that dies with it, so a reader knows growing from
-//               left behind.
+// Format        A header of 64 bytes, then 24 bytes per frame in file order, which is decoding order; all little
+//               endian. Header and entries each carry a checksum. The header's last byte is 1 once the recording is
+//               finished.
+// Crash rule    An entry is appended after its frame is in the recording. A torn entry at the end is ignored. Until it
+//               finishes, the writer holds a lock on the file that ends with its process, so a reader can tell a
+//               growing recording from an abandoned one.
 #pragma once
 
 #include <cstdint>
@@ -21,43 +21,41 @@
 
 namespace lookhaven::archive {
 
-// No frame of a recording is larger.
-constexpr std::uint32_t kMaxFrameBytes = 4'194'303;
-
 struct IndexHeader {
     std::string codec;        // "MJPEG", "H264", "H265"
     std::string audio_codec;  // "AAC", "PCMU", "PCMA", "OPUS"; empty when silent
     int width = 0;            // pixels
     int height = 0;
     std::int64_t start_wall_ms = 0;  // of the frame at 0 ms
-    int reason = 0;                  // REC_METHOD of platform/recording/event.h
+    int reason = 0;                  // base::kReasonContinuous …
 
     bool operator==(const IndexHeader&) const = default;
 };
 
 struct FrameEntry {
     std::uint64_t offset = 0;   // of the frame's first byte in the recording
-    std::uint32_t size = 0;     // bytes, 1 … kMaxFrameBytes
-    std::uint32_t time_ms = 0;  // when it is shown, from the recording's start
-    bool key = false;           // needs no frame before it
+    std::uint32_t size = 0;     // bytes, 1 … base::kMaxFrameBytes
+    std::uint32_t time_ms = 0;  // presentation time, from the recording's start
+    bool key = false;           // decodable without the frames before it
 
     bool operator==(const FrameEntry&) const = default;
 };
 
-// From the first frame to where the last one leaves the screen, if the frames follow each other evenly and none stands
-// longer than a second. last_time_ms: of the last frame; 0 without frames.
+// The length of a recording including its last frame's time on the screen, which is taken to be the mean distance of
+// frames, at most a second. last_time_ms: presentation time of the last frame. 0 without frames.
 std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms);
 
 class FrameIndexWriter {
   public:
-    // Makes the file, which must not exist, and locks it. Throws std::system_error.
+    // Creates the file, which must not exist, and locks it. Throws std::system_error; then there is no file.
     FrameIndexWriter(const std::filesystem::path& path, const IndexHeader& header);
 
-    // Appends the entries, whose frames are in the recording already. Throws std::system_error; then the file holds what
-    // it held before.
+    // Appends the entries, whose frames must be in the recording already. Throws std::system_error; then the index is
+    // unchanged.
     void Append(std::span<const FrameEntry> entries);
 
-    // Marks the recording finished and gives the lock up. Throws std::system_error.
+    // Marks the recording finished and releases the lock; nothing else may be called afterwards. Throws
+    // std::system_error.
     void Finish();
 
     std::uint64_t SizeBytes() const { return size_bytes_; }
@@ -76,13 +74,13 @@ class FrameIndexReader {
 
     const IndexHeader& Header() const { return header_; }
 
-    // Appends the entries that were not read yet and whose frames lie within the recording's first recording_bytes; in
-    // the order of the file. Throws ArchiveError when the index is damaged.
+    // Appends the entries that were not read yet and whose frames lie within the recording's first recording_bytes, in
+    // decoding order. Throws ArchiveError when the index is damaged; the entries before the damage are appended then.
     void ReadNew(std::uint64_t recording_bytes, std::vector<FrameEntry>& entries);
 
-    // Still being written, by a writer that lives.
+    // A living writer is still writing it.
     bool IsGrowing() const;
-    // The writer came to its orderly end.
+    // The writer has finished it in order. Both are false for a recording whose writer died.
     bool IsFinished() const;
 
   private:

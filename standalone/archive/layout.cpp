@@ -23,7 +23,7 @@ std::string Format(std::int64_t second, const char* format) {
     return {text.data(), std::strftime(text.data(), text.size(), format, &utc)};
 }
 
-// The number of digits that end the text or stand in front of the stop, which is taken off too.
+// Parses the digits in front of the stop character and removes both from the text.
 template <class T>
 bool TakeNumber(std::string_view& text, char stop, T& number) {
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -66,7 +66,7 @@ std::optional<FileName> ParsePath(std::string_view relative_path) {
     name.start_s = timegm(&utc);
     for (const FileKind kind : {FileKind::kRecording, FileKind::kIndex, FileKind::kSpan}) {
         name.kind = kind;
-        // Made anew it must be the same, or numbers were out of range or written in another way.
+        // Formatted again it must be the same, else a number is out of range or spelled differently.
         if (PathOf(name) == relative_path) {
             return name;
         }
@@ -81,7 +81,7 @@ std::filesystem::path IndexPathOf(std::filesystem::path recording) {
 void MakeFolderFor(const std::filesystem::path& mount, const FileName& name) {
     const std::filesystem::path camera = mount / std::to_string(name.camera);
     for (const std::filesystem::path& folder : {camera, camera / DayOf(name.start_s)}) {
-        std::filesystem::create_directory(folder);  // in a folder that is missing this fails
+        std::filesystem::create_directory(folder);  // fails when the parent is missing
     }
 }
 

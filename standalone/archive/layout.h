@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Where recordings lie on a storage mount, and which files there are ours.
+// The paths of files on a storage mount, and which files there are ours.
 //
 //   <mount>/<camera>/2026-03-01/081530-12.mkv     the recording of event 12, which began at 08:15:30 UTC
 //   <mount>/<camera>/2026-03-01/081530-12.index   its frame index (frame_index.h)
@@ -16,12 +16,9 @@
 
 namespace lookhaven::archive {
 
-// No recording is longer; searches and readers rely on it.
-constexpr int kMaxRecordingSeconds = 7200;
-
 enum class FileKind { kRecording, kIndex, kSpan };
 
-// What the path of a file says.
+// What the path of a file encodes.
 struct FileName {
     int camera = 0;
     std::int64_t start_s = 0;  // seconds since the epoch (UTC)
@@ -34,7 +31,7 @@ struct FileName {
 // The path relative to the mount, "3/2026-03-01/081530-12.mkv".
 std::string PathOf(const FileName& name);
 
-// The reverse; nothing when the path is not exactly one that PathOf makes. Whatever is unknown is not ours to touch.
+// The reverse; nothing when PathOf does not produce exactly this path. Files with other paths must not be touched.
 std::optional<FileName> ParsePath(std::string_view relative_path);
 
 // The frame index beside a recording.
@@ -43,8 +40,8 @@ std::filesystem::path IndexPathOf(std::filesystem::path recording);
 // "2026-03-01": the folder of the UTC day that holds the second.
 std::string DayOf(std::int64_t second);
 
-// Makes the folder for the file below a mount. Never makes the mount itself, since a missing one is a disk that is not
-// there. Throws std::system_error.
+// Creates the file's folders below the mount. Never creates the mount itself: when it is missing, its disk is not
+// mounted. Throws std::system_error.
 void MakeFolderFor(const std::filesystem::path& mount, const FileName& name);
 
 }  // namespace lookhaven::archive

@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
@@ -43,7 +44,7 @@ constexpr std::uint8_t kKeyFlag = 0x80;
 constexpr std::uint8_t kLacingFlags = 0x06;
 constexpr std::int64_t kYear2001Ms = 978'307'200'000;
 
-// A number whose first byte says by its leading zeros how many bytes follow.
+// An EBML number: the leading zeros of its first byte say how many bytes follow.
 struct VariableNumber {
     std::uint64_t with_marker = 0;
     std::uint64_t value = 0;
@@ -52,13 +53,13 @@ struct VariableNumber {
     bool IsUnknown() const { return value == (std::uint64_t{1} << (7 * length)) - 1; }
 };
 
-std::optional<VariableNumber> ParseNumber(std::span<const std::uint8_t> bytes, std::size_t longest) {
+std::optional<VariableNumber> ParseNumber(std::span<const std::uint8_t> bytes, std::size_t max_bytes) {
     if (bytes.empty() || bytes[0] == 0) {
         return std::nullopt;
     }
     VariableNumber number;
     number.length = static_cast<std::size_t>(std::countl_zero(bytes[0])) + 1;
-    if (number.length > longest || number.length > bytes.size()) {
+    if (number.length > max_bytes || number.length > bytes.size()) {
         return std::nullopt;
     }
     for (const std::uint8_t byte : bytes.first(number.length)) {
@@ -68,7 +69,7 @@ std::optional<VariableNumber> ParseNumber(std::span<const std::uint8_t> bytes, s
     return number;
 }
 
-std::string CodecOf(const std::string& id, std::span<const std::uint8_t> private_data) {
+std::string CodecNameOf(const std::string& id, std::span<const std::uint8_t> private_data) {
     static constexpr std::pair<const char*, const char*> kCodecs[] = {
         {"V_MJPEG", "MJPEG"}, {"V_MPEG4/ISO/AVC", "H264"}, {"V_MPEGH/ISO/HEVC", "H265"},
         {"A_AAC", "AAC"},     {"A_OPUS", "OPUS"},
@@ -78,6 +79,7 @@ std::string CodecOf(const std::string& id, std::span<const std::uint8_t> private
             return name;
         }
     }
+    // Sound in a Windows format: its private data begins with the format's number.
     if (id == "A_MS/ACM" && private_data.size() >= 2 && private_data[1] == 0) {
         return private_data[0] == 6 ? "PCMA" : private_data[0] == 7 ? "PCMU" : "";
     }
@@ -239,7 +241,7 @@ void MatroskaBlocks::ReadTrack(const Element& track) {
         }
         return true;
     });
-    const std::string codec = CodecOf(id, private_data);
+    const std::string codec = CodecNameOf(id, private_data);
     if (id.starts_with("A_")) {
         header_.audio_codec = codec;
     } else if (!codec.empty() && header_.codec.empty()) {
@@ -316,7 +318,7 @@ bool MatroskaBlocks::ReadBlock(const Element& block, std::uint64_t cluster_time,
     const std::uint8_t flags = rest[2];
     const std::int64_t time = static_cast<std::int64_t>(cluster_time) + relative;
     const std::uint64_t frame = block.data + track->length + 3;
-    if (time < 0 || (flags & kLacingFlags) != 0 || frame == block.end || block.end - frame > kMaxFrameBytes) {
+    if (time < 0 || (flags & kLacingFlags) != 0 || frame == block.end || block.end - frame > base::kMaxFrameBytes) {
         return false;
     }
     const std::uint64_t time_ms = static_cast<std::uint64_t>(time) * timestamp_scale_ns_ / 1'000'000;

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Walks a Matroska file, finished or not, to learn where its video frames lie; reads heads only, never frames.
+// Finds the video frames of a Matroska file, finished or not. Reads element headers only, never frames.
 //
-// Why so        A frame index is written from what is in the file, not from what was handed to a muxer, and is made anew
+// Why so        A frame index is built from what is in the file, not from what was passed to the muxer, and is rebuilt
 //               the same way when it was lost.
-// Invariants    Every size read from the file is checked against the file before use; nothing it says makes the walk
-//               read outside the file, loop without progress or claim memory.
+// Invariants    Every size read from the file is checked against the file before use: no contents make this read
+//               outside the file, loop forever or allocate without bound.
 #pragma once
 
 #include <cstdint>
@@ -21,19 +21,19 @@ namespace lookhaven::archive {
 
 class MatroskaBlocks {
   public:
-    // Reads the file's head up to its first cluster. Borrows the descriptor. Throws ArchiveError when this is no Matroska
-    // file with a video track that we know; std::system_error.
+    // Reads everything before the first cluster. Borrows the descriptor. Throws ArchiveError when this is no Matroska
+    // file with a video track in a supported codec; std::system_error.
     explicit MatroskaBlocks(int file);
 
-    // What the head says; the reason is 0, and the start is 0 when it does not say.
+    // From the file; the reason is always 0, and the start is 0 when the file does not say.
     const IndexHeader& Header() const { return header_; }
 
-    // Appends the video frames of the next cluster that is whole. False, without a change, when there is none (yet): the
-    // file ends, is cut, or what follows is no cluster. May be asked again after the file has grown. Throws
+    // Appends the video frames of the next complete cluster. False, without a change, when there is none (yet): the
+    // file ends, is truncated, or is damaged here. May be called again after the file has grown. Throws
     // std::system_error.
     bool ReadCluster(std::vector<FrameEntry>& frames);
 
-    // The end of the last whole cluster, or of the head.
+    // Where the last complete cluster ends, or what precedes the first.
     std::uint64_t Position() const { return position_; }
 
   private:

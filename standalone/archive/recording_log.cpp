@@ -18,8 +18,8 @@ namespace {
 
 constexpr std::int64_t kDaySeconds = 86'400;
 
-// Calls day(path, offset, first, count) for each day that the seconds touch: count seconds from offset within the day,
-// which are those from "first" of the stretch on.
+// Calls day(path, offset, first, count) for each UTC day of [begin_s, end_s): count seconds from offset within the day,
+// which begin "first" seconds after begin_s.
 template <class Day>
 void ForEachDay(const std::filesystem::path& camera_folder, std::int64_t begin_s, std::int64_t end_s, Day day) {
     for (std::int64_t at = std::max<std::int64_t>(begin_s, 0); at < end_s;) {
@@ -36,7 +36,7 @@ void ForEachDay(const std::filesystem::path& camera_folder, std::int64_t begin_s
 void WriteRecordingLog(const std::filesystem::path& camera_folder, std::int64_t begin_s, std::int64_t end_s,
                        std::uint8_t reason) {
     if (end_s - begin_s > kDaySeconds) {
-        throw std::logic_error("a stretch of recording longer than a day");
+        throw std::logic_error("more than a day of recording log at once");
     }
     const auto write = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t, std::size_t count) {
         std::filesystem::create_directory(path.parent_path());
@@ -51,7 +51,7 @@ void WriteRecordingLog(const std::filesystem::path& camera_folder, std::int64_t 
             }
             done += static_cast<std::size_t>(std::max<ssize_t>(written, 0));
         }
-        // Readers take what is missing at the end for zeros, but the file says its size for those who look at it.
+        // Readers take missing bytes at the end for zeros; the full size is for people who look at the file.
         if (::lseek(log.Get(), 0, SEEK_END) < kDaySeconds && ::ftruncate(log.Get(), kDaySeconds) != 0) {
             base::ThrowErrno("cannot write " + path.string());
         }

@@ -13,18 +13,17 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/base/file.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
 namespace {
 
-constexpr int kContinuous = 1;  // the REC_METHOD of a recording whose own is lost
-
 struct Index {
     IndexHeader header;
     std::vector<FrameEntry> frames;
     bool is_finished = false;
-    bool is_damaged = false;  // behind the frames
+    bool is_damaged = false;  // after the frames
 };
 
 std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::path& path) {
@@ -35,7 +34,7 @@ std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::pa
     return static_cast<std::uint64_t>(status.st_size);
 }
 
-// What is left of the index; nothing when there is none, or not even a head.
+// The readable part of the index; nothing when it is missing or even its header is damaged.
 std::optional<Index> ReadIndex(const std::filesystem::path& path, std::uint64_t recording_bytes) {
     try {
         FrameIndexReader reader(path);
@@ -88,7 +87,7 @@ Contents Summary(const IndexHeader& header, const std::vector<FrameEntry>& frame
             recording_bytes + std::filesystem::file_size(index_path)};
 }
 
-// Every frame that can be reached from the beginning, and where they end.
+// Every frame up to the first damage, and where they end.
 struct Walk {
     IndexHeader header;
     std::vector<FrameEntry> frames;
@@ -125,16 +124,16 @@ Contents CloseCrashed(const std::filesystem::path& recording) {
     if (!walk) {
         return {};
     }
-    // A walk that ends before what the index knows met damage in the middle: what lies behind is still there.
+    // Fewer frames than the index lists means damage in the middle: the frames after it are still there.
     if (index && !index->is_damaged && EndOf(index->frames) > EndOf(walk->frames)) {
         walk->frames = index->frames;
         walk->end = size;
     }
     if (walk->end < size && ::ftruncate(file.Get(), static_cast<off_t>(walk->end)) != 0) {
-        base::ThrowErrno("cannot cut " + recording.string());
+        base::ThrowErrno("cannot truncate " + recording.string());
     }
     IndexHeader header = index ? index->header : walk->header;
-    header.reason = index ? header.reason : kContinuous;
+    header.reason = index ? header.reason : base::kReasonContinuous;  // the file itself does not say
     ReplaceIndex(index_path, header, walk->frames);
     return Summary(header, walk->frames, std::min(size, walk->end), index_path);
 }

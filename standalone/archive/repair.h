@@ -10,18 +10,18 @@
 
 namespace lookhaven::archive {
 
-// What a recording holds after all.
+// What a recording holds.
 struct Contents {
     IndexHeader header;
     int frame_count = 0;
-    std::int64_t duration_ms = 0;  // to the end of the last frame's time on the screen
+    std::int64_t duration_ms = 0;  // including the last frame's time on the screen
     std::uint64_t size_bytes = 0;  // of the recording and its index
 };
 
-// Cuts the recording behind its last whole cluster and makes its index say exactly what is there; an absent or damaged
-// index is made anew. Does nothing to a recording that is whole. frame_count is 0 when nothing can be saved; then the
-// files are unchanged, and the caller may remove them. Throws std::system_error,
-// EBUSY while the recording is still being written.
+// Truncates the recording after its last complete cluster and makes its index list exactly what is there; a missing or
+// damaged index is rebuilt. Does nothing to a recording that is finished and intact. frame_count is 0 when nothing can
+// be saved; then the files are unchanged, and the caller may remove them. Throws std::system_error, EBUSY while the
+// recording is still being written.
 Contents CloseCrashed(const std::filesystem::path& recording);
 
 }  // namespace lookhaven::archive

@@ -11,6 +11,7 @@
 
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
@@ -19,7 +20,7 @@ namespace {
 constexpr std::string_view kFirstLine = "lookhaven span 1";
 constexpr std::size_t kMaxBytes = 128 * kMaxSpanRecordings;
 
-// The rest of the next line behind the word, or nothing when it begins otherwise or has no end.
+// Removes the next line and returns what follows the word; nothing when the line begins otherwise or is incomplete.
 std::optional<std::string_view> TakeLine(std::string_view& text, std::string_view word) {
     const std::size_t end = text.find('\n');
     if (end == std::string_view::npos || !text.starts_with(word)) {
@@ -48,7 +49,7 @@ Span Parse(std::string_view text, const std::string& path) {
         throw ArchiveError(path + " is no span of recordings");
     }
     if (span.begin_ms < 0 || span.end_ms < span.begin_ms ||
-        span.end_ms - span.begin_ms > std::int64_t{kMaxRecordingSeconds} * 1000) {
+        span.end_ms - span.begin_ms > std::int64_t{base::kMaxRecordingSeconds} * 1000) {
         throw ArchiveError(path + " names an impossible time");
     }
     while (!text.empty()) {

@@ -26,9 +26,9 @@ using lookhaven::binding::OrFailure;
 using lookhaven::binding::RecordOf;
 using lookhaven::binding::RequestContext;
 
-static_assert(static_cast<int>(store::VideoType::kMjpeg) == CAM_VIDEO_MJPEG);
-static_assert(static_cast<int>(store::VideoType::kH264) == CAM_VIDEO_H264);
-static_assert(static_cast<int>(store::VideoType::kH265) == CAM_VIDEO_H265);
+static_assert(static_cast<int>(base::Codec::kMjpeg) == CAM_VIDEO_MJPEG);
+static_assert(static_cast<int>(base::Codec::kH264) == CAM_VIDEO_H264);
+static_assert(static_cast<int>(base::Codec::kH265) == CAM_VIDEO_H265);
 static_assert(store::kProfileCount == CAM_PROFILE_COUNT);
 
 namespace {

@@ -22,7 +22,7 @@ using lookhaven::binding::RequestContext;
 
 static_assert(static_cast<int>(store::MarkKind::kAlert) == REC_EVENT_ALERT);
 static_assert(static_cast<int>(store::MarkKind::kPos) == REC_EVENT_POS);
-static_assert(store::kReasonContinuous == REC_METHOD_CONTINUOUS && store::kReasonAlarm == REC_METHOD_ALARM);
+static_assert(base::kReasonContinuous == REC_METHOD_CONTINUOUS && base::kReasonAlarm == REC_METHOD_ALARM);
 
 namespace {
 

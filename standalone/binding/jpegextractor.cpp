@@ -11,7 +11,7 @@
 
 #include <time.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/media/picture_reader.h"
@@ -44,7 +44,7 @@ struct JpegExtractor::Recording {
     std::size_t Read(int index, std::span<std::uint8_t> buffer);
     std::size_t Repeat(int index, std::span<std::uint8_t> buffer);
 
-    archive::Recording frames;
+    archive::RecordingReader frames;
     lookhaven::media::PictureReader pictures;
     int last_index = -1;
     std::int64_t answered_us = 0;

@@ -113,7 +113,7 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
         }
         context.GrantStream({camId, streamNo}, MayUse(camId, store::CameraAccess::kAudio));
         context.CloseRecords();
-        return AttachRunning(context, {camId, streamNo, ring::Medium::kVideo});
+        return AttachRunning(context, {camId, streamNo, base::Medium::kVideo});
     });
     return static_cast<ShmStreamFifo*>(stream);
 }
@@ -125,7 +125,7 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
         if (context.GrantedStream() != control::LiveStream{camId, streamNo}) {
             return nullptr;
         }
-        const ring::StreamId id{camId, streamNo, ring::Medium::kAudio};
+        const ring::StreamId id{camId, streamNo, base::Medium::kAudio};
         void* sound = context.MayHear() ? ring::Attach(context.Home(), id) : nullptr;
         return sound != nullptr ? sound : ring::AttachEmpty(id, {});
     });

@@ -23,7 +23,6 @@ using store::Camera;
 using store::Cameras;
 using store::RecordingPlan;
 using store::RecordingPlans;
-using store::VideoType;
 
 constexpr std::chrono::seconds kProbeLimit{10};
 
@@ -78,20 +77,6 @@ media::ProbeResult Probe(const std::string& source, const std::optional<store::C
     return media::ProbeSource(pattern::AllSourceKinds(), source, login, kProbeLimit);
 }
 
-VideoType TypeOf(media::Codec codec) {
-    switch (codec) {
-    case media::Codec::kMjpeg:
-        return VideoType::kMjpeg;
-    case media::Codec::kH264:
-        return VideoType::kH264;
-    case media::Codec::kH265:
-        return VideoType::kH265;
-    default:
-        throw Failure(kDataError, std::string("the source sends ") + media::CodecName(codec) +
-                                      ", which is none of MJPEG, H.264 and H.265");
-    }
-}
-
 // An empty account takes the stored one away; no account at all leaves it.
 std::optional<store::Credentials> AskCredentials(const Request& request) {
     if (!request.account || request.account->empty()) {
@@ -108,11 +93,15 @@ void FindOut(Camera& camera, const Request& request, const std::optional<store::
     }
     const std::string& source = live->source;
     if (source.starts_with("http")) {
-        camera.video_type = VideoType::kMjpeg;
+        camera.video_type = base::Codec::kMjpeg;
         return;
     }
     const media::ProbeResult found = Probe(source, credentials);
-    camera.video_type = TypeOf(found.video.codec);
+    if (!base::IsVideo(found.video.codec)) {
+        throw Failure(kDataError, std::string("the source sends ") + base::CodecName(found.video.codec) +
+                                      ", which is none of MJPEG, H.264 and H.265");
+    }
+    camera.video_type = found.video.codec;
     if (!request.options.HasAudio()) {
         camera.audio = found.audio.has_value();
     }
@@ -229,20 +218,20 @@ media::ProbeResult ProbeTarget(const Console& console, const Request& request) {
 void ShowProbe(const Console& console, const Request& request) {
     const media::ProbeResult found = ProbeTarget(console, request);
     Json::Value data;
-    data["video"]["codec"] = media::CodecName(found.video.codec);
+    data["video"]["codec"] = base::CodecName(found.video.codec);
     data["video"]["width"] = found.video.width;
     data["video"]["height"] = found.video.height;
     data["video"]["fps"] = found.frames_per_second;
     char fps[32];
     std::snprintf(fps, sizeof fps, "%.1f", found.frames_per_second);
-    std::string text = std::string("Video: ") + media::CodecName(found.video.codec) + " " +
+    std::string text = std::string("Video: ") + base::CodecName(found.video.codec) + " " +
                        std::to_string(found.video.width) + "x" + std::to_string(found.video.height) + ", " + fps +
                        " frames per second\n";
     if (found.audio) {
-        data["audio"]["codec"] = media::CodecName(found.audio->codec);
+        data["audio"]["codec"] = base::CodecName(found.audio->codec);
         data["audio"]["sample_rate"] = found.audio->sample_rate_hz;
         data["audio"]["channels"] = found.audio->channels;
-        text += std::string("Audio: ") + media::CodecName(found.audio->codec) + ", " +
+        text += std::string("Audio: ") + base::CodecName(found.audio->codec) + ", " +
                 std::to_string(found.audio->sample_rate_hz) + " Hz, " + std::to_string(found.audio->channels) +
                 " channels\n";
     } else {

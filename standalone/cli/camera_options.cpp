@@ -14,10 +14,9 @@ namespace {
 
 using store::Camera;
 using store::CameraProfile;
-using store::VideoType;
 
-const std::map<std::string, VideoType> kTypes = {
-    {"mjpeg", VideoType::kMjpeg}, {"h264", VideoType::kH264}, {"h265", VideoType::kH265}};
+const std::map<std::string, base::Codec> kTypes = {
+    {"mjpeg", base::Codec::kMjpeg}, {"h264", base::Codec::kH264}, {"h265", base::Codec::kH265}};
 const std::map<std::string, int> kProfiles = {{"high", 0}, {"low", 1}, {"mobile", 2}};
 
 // "640x360"
@@ -107,8 +106,8 @@ const std::map<std::string, int>& ProfileNames() {
     return kProfiles;
 }
 
-const char* VideoTypeName(VideoType type) {
-    return type == VideoType::kMjpeg ? "MJPEG" : type == VideoType::kH264 ? "H.264" : "H.265";
+const char* VideoTypeName(base::Codec type) {
+    return type == base::Codec::kMjpeg ? "MJPEG" : type == base::Codec::kH264 ? "H.264" : "H.265";
 }
 
 }  // namespace lookhaven::cli

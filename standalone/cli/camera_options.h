@@ -34,7 +34,7 @@ class CameraOptions {
     };
 
     std::optional<std::string> name_;
-    std::optional<store::VideoType> type_;
+    std::optional<base::Codec> type_;
     std::optional<int> live_profile_;
     std::optional<bool> enabled_;
     std::optional<bool> ptz_;
@@ -46,6 +46,6 @@ class CameraOptions {
 const std::map<std::string, int>& ProfileNames();
 
 // "H.264" and so on.
-const char* VideoTypeName(store::VideoType type);
+const char* VideoTypeName(base::Codec type);
 
 }  // namespace lookhaven::cli

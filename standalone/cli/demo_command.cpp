@@ -22,7 +22,6 @@ namespace lookhaven::cli {
 namespace {
 
 using store::Camera;
-using store::VideoType;
 
 constexpr const char* kViewer = "viewer";
 constexpr const char* kDeniedCamera = "Parking";
@@ -36,7 +35,7 @@ std::vector<Camera> DemoCameras() {
          .profiles = {{0, "test:mjpeg?size=1280x720&fps=25&label=Entrance", 1280, 720, 25},
                       {1, "test:mjpeg?size=640x360&fps=25&label=Entrance", 640, 360, 25}}},
         {.name = kDeniedCamera,
-         .video_type = VideoType::kH264,
+         .video_type = base::Codec::kH264,
          .audio = true,
          .profiles = {{0, "test:h264?size=1280x720&fps=25&audio=aac&label=Parking", 1280, 720, 25}}},
         {.name = "Warehouse",

@@ -19,7 +19,7 @@
 #include "standalone/cli/units.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/recording_state.h"
+#include "standalone/maintenance/recording_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
@@ -181,7 +181,7 @@ Findings CheckRecordings(const base::Installation& installation) {
         return {};
     }
     Findings findings;
-    for (const maintenance::CameraRecordingState& state : maintenance::ReadRecordingStates(installation)) {
+    for (const maintenance::RecordingStatus& state : maintenance::ReadRecordingStatus(installation)) {
         if (state.state != maintenance::RecordingState::kReady &&
             state.state != maintenance::RecordingState::kRecording) {
             findings.push_back(

@@ -33,7 +33,7 @@ using store::MarkState;
 
 const std::map<std::string, int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
 const std::map<std::string, MarkKind> kMarkKinds = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
-const std::map<std::string, int> kReasons = {{"continuous", store::kReasonContinuous}, {"alarm", store::kReasonAlarm}};
+const std::map<std::string, int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", base::kReasonAlarm}};
 
 struct Request {
     int id = 0;

@@ -59,9 +59,9 @@ Json::Value ToData(const store::Mark& mark) {
 }
 
 std::string Description(const store::Event& event) {
-    const std::string reason = event.reason == store::kReasonAlarm        ? "an alarm"
-                               : event.reason == store::kReasonContinuous ? "continuous recording"
-                                                                          : "reason " + std::to_string(event.reason);
+    const std::string reason = event.reason == base::kReasonAlarm        ? "an alarm"
+                               : event.reason == base::kReasonContinuous ? "continuous recording"
+                                                                         : "reason " + std::to_string(event.reason);
     return "Event " + std::to_string(event.id) + " of camera " + std::to_string(event.camera_id) + ", " + reason +
            (event.recording ? ", still recording" : "") + (event.archived ? ", archived" : "") +
            (event.demo ? ", made up for a trial" : "") + "\nfrom   " + FormatMoment(event.start_s) + "\nto     " +

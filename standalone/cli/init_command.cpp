@@ -52,7 +52,7 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.name = "default";
     mount.path = folder.lexically_normal().string();
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
-    maintenance::MountFolder::Mark(folder, mounts.Add(mount));
+    maintenance::MountFolder::WriteMarker(folder, mounts.Add(mount));
     return true;
 }
 

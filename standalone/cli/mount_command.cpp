@@ -79,7 +79,7 @@ void Add(const Console& console, const Request& request) {
         mount.name = std::filesystem::path(mount.path).filename();
     }
     mount.id = Mounts(store).Add(mount);
-    maintenance::MountFolder::Mark(mount.path, mount.id);
+    maintenance::MountFolder::WriteMarker(mount.path, mount.id);
     console.Answer("The mount " + mount.name + " has the id " + std::to_string(mount.id) + ".",
                    ToData(*Mounts(store).Find(mount.id)));
 }
@@ -93,7 +93,7 @@ void Change(const Console& console, const Request& request) {
     Apply(*mount, request);
     Mounts(store).Update(*mount);
     if (!request.path.empty()) {
-        maintenance::MountFolder::Mark(mount->path, mount->id);
+        maintenance::MountFolder::WriteMarker(mount->path, mount->id);
     }
     console.Answer("The mount " + mount->name + " is changed.", ToData(*mount));
 }

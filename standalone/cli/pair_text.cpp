@@ -31,7 +31,7 @@ PairOffer Read(const Json::Value& json) {
     for (const Json::Value& camera : json["cameras"]) {
         offer.cameras.push_back({.id_on_server = camera["id"].asInt(),
                                  .name = camera["name"].asString(),
-                                 .video_type = static_cast<store::VideoType>(camera["video"].asInt()),
+                                 .video_type = static_cast<base::Codec>(camera["video"].asInt()),
                                  .audio = camera["audio"].asBool()});
     }
     return offer;

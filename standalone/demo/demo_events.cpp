@@ -18,7 +18,6 @@ namespace {
 
 using store::Event;
 using store::Mark;
-using store::VideoType;
 
 constexpr std::int64_t kDaySeconds = 86400;
 constexpr std::size_t kRowsAtOnce = 20'000;
@@ -37,14 +36,14 @@ class Inventor {
         const std::int64_t length = Draw(std::max<std::int64_t>(longest / 4, 1), longest);
         event.start_s = slot_start_s + Draw(0, std::max<std::int64_t>(static_cast<std::int64_t>(slot_s_) - length, 0));
         event.end_s = event.start_s + length;
-        event.reason = Draw(0, 9) == 0 ? store::kReasonAlarm : store::kReasonContinuous;
+        event.reason = Draw(0, 9) == 0 ? base::kReasonAlarm : base::kReasonContinuous;
         event.frame_count = static_cast<int>(length * 25);
         event.video_type = camera.video_type;
-        event.audio_codec = camera.audio ? media::CodecName(media::Codec::kAac) : "";
+        event.audio_codec = camera.audio ? base::CodecName(base::Codec::kAac) : "";
         const store::CameraProfile* profile = camera.FindProfile(camera.live_profile);
         event.width = profile != nullptr && profile->width > 0 ? profile->width : 1280;
         event.height = profile != nullptr && profile->height > 0 ? profile->height : 720;
-        event.size_bytes = length * Draw(150'000, 400'000) * (event.video_type == VideoType::kMjpeg ? 8 : 1);
+        event.size_bytes = length * Draw(150'000, 400'000) * (event.video_type == base::Codec::kMjpeg ? 8 : 1);
         event.path = archive::PathOf({camera.id, event.start_s, number, archive::FileKind::kRecording});
         event.demo = true;
         return event;

@@ -37,8 +37,8 @@ class SceneRecorder {
   public:
     explicit SceneRecorder(const store::Camera& camera)
         : scene_(kSettings.width, kSettings.height, camera.name),
-          encoder_(pattern::MakePatternEncoder(camera.video_type == store::VideoType::kMjpeg ? "mjpeg" : "h264",
-                                               kSettings)) {
+          encoder_(
+              pattern::MakePatternEncoder(camera.video_type == base::Codec::kMjpeg ? "mjpeg" : "h264", kSettings)) {
         if (camera.audio) {
             chime_.emplace();
         }
@@ -53,13 +53,13 @@ class SceneRecorder {
             // The numbers go on over all scenes, since the encoder counts its key frames by them.
             const pattern::EncodedPicture encoded = encoder_->Encode(picture, number_++);
             if (!writer) {
-                writer.emplace(file, media::RecordingFormat{encoder_->Format(), AudioFormat()}, start_s * 1000,
-                               store::kReasonContinuous);
+                writer.emplace(file, media::MediaFormat{encoder_->Format(), AudioFormat()}, start_s * 1000,
+                               base::kReasonContinuous);
             }
-            writer->Write({media::Medium::kVideo, encoded.data, time_us, encoded.key_frame, &encoder_->Format()});
+            writer->Write({base::Medium::kVideo, encoded.data, time_us, encoded.key_frame, &encoder_->Format()});
             for (; chime_ && chime_->BlockTime(block) <= time_us; ++block) {
                 writer->Write(
-                    {media::Medium::kAudio, chime_->Block(block), chime_->BlockTime(block), true, &chime_->Format()});
+                    {base::Medium::kAudio, chime_->Block(block), chime_->BlockTime(block), true, &chime_->Format()});
             }
         }
         writer->Close();
@@ -78,7 +78,7 @@ class SceneRecorder {
 
 bool IsRecordedPattern(const store::Camera& camera, const store::RecordingPlan& plan) {
     const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
-    return live != nullptr && live->source.starts_with("test:") && camera.video_type != store::VideoType::kH265 &&
+    return live != nullptr && live->source.starts_with("test:") && camera.video_type != base::Codec::kH265 &&
            plan.mode == store::RecordMode::kAlways;
 }
 
@@ -118,7 +118,7 @@ DemoFootage RecordDemoFootage(store::Store& store, std::int64_t now_s) {
             const std::filesystem::path file = std::filesystem::path(mount->path) / archive::PathOf(name);
             recorder.Record(file, start_s);
             archive::WriteRecordingLog(std::filesystem::path(mount->path) / std::to_string(camera.id), start_s,
-                                       start_s + kSceneSeconds, store::kReasonContinuous);
+                                       start_s + kSceneSeconds, base::kReasonContinuous);
             events.Begin(maintenance::RowOf(name, mount->id, archive::CloseCrashed(file)));
             AddMark(store, camera.id, start_s + kMarkAfterS, made.marks % 2 == 1);
             ++made.events;

@@ -16,8 +16,8 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-// Rows follow their files within about a second; after this nothing more comes.
-constexpr std::int64_t kPatienceS = 10;
+// Rows are stored about a second after their frames; after this time no more footage is expected.
+constexpr std::int64_t kMaxRowDelayS = 10;
 
 std::vector<store::Event> FootageOf(store::Events& events, const store::Mark& mark) {
     store::EventFilter filter;
@@ -33,7 +33,7 @@ bool IsComplete(const std::vector<store::Event>& footage, const store::Mark& mar
     return std::ranges::any_of(footage, [&](const store::Event& event) { return event.end_s >= mark.end_s; });
 }
 
-// A span file names recordings of one mount: that of its last one.
+// A span file can only name recordings of one mount: here that of the last one.
 archive::Span SpanOf(const std::vector<store::Event>& footage, const store::Mark& mark) {
     archive::Span span{mark.start_s * 1000, mark.end_s * 1000, {}};
     for (const store::Event& event : footage) {
@@ -72,7 +72,7 @@ void CompleteMarks(store::Store& store, std::int64_t now_s) {
         }
         try {
             store::Events events(store);
-            if (now_s >= mark.end_s + kPatienceS || IsComplete(FootageOf(events, mark), mark)) {
+            if (now_s >= mark.end_s + kMaxRowDelayS || IsComplete(FootageOf(events, mark), mark)) {
                 SaveMark(store, mark);
             }
         } catch (const store::StoreError&) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Gives alarms and sales their footage once it has been recorded.
+// Attaches the footage to alerts and POS events (marks) once it has been recorded.
 #pragma once
 
 #include <cstdint>
@@ -10,13 +10,13 @@
 
 namespace lookhaven::maintenance {
 
-// Writes a span file for each pending mark whose span is on the disk, or will not come any more, and saves its row; a
-// mark of which nothing was recorded is missed. A mount that is not there keeps its marks pending. Costs one query when
-// no mark is pending. Throws store::StoreError.
+// Writes a span file for each pending mark whose footage is on the disk, or can no longer be expected, and marks its
+// row saved. A mark without any footage becomes missed. While its mount is not mounted a mark stays pending. Costs one
+// query when no mark is pending. Throws store::StoreError; trouble with one mark is logged and leaves the others.
 void CompleteMarks(store::Store& store, std::int64_t now_s);
 
-// Writes the mark's span file anew from the rows of its footage, and saves or misses the mark. False when the mount is
-// not there. Throws store::StoreError, std::system_error.
+// Writes the mark's span file from the rows of its footage, replacing one that exists, and sets the mark to saved or
+// missed. False when the mount is not mounted. Throws store::StoreError, std::system_error.
 bool SaveMark(store::Store& store, const store::Mark& mark);
 
 }  // namespace lookhaven::maintenance

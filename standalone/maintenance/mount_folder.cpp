@@ -21,11 +21,11 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr const char* kMarkName = ".lookhaven-mount";
+constexpr const char* kMarkerName = ".lookhaven-mount";
 constexpr const char* kLogName = "seconds";
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
-std::string MarkText(int mount_id) {
+std::string MarkerText(int mount_id) {
     return "lookhaven mount " + std::to_string(mount_id) + "\n";
 }
 
@@ -74,13 +74,13 @@ std::int64_t MountSpace::ReserveBytes() const {
     return std::clamp(total_bytes / 50, 2 * kMiB, 512 * kMiB);
 }
 
-void MountFolder::Mark(const std::filesystem::path& folder, int mount_id) {
-    base::WriteFileAtomically(folder / kMarkName, MarkText(mount_id), 0644);
+void MountFolder::WriteMarker(const std::filesystem::path& folder, int mount_id) {
+    base::WriteFileAtomically(folder / kMarkerName, MarkerText(mount_id), 0644);
 }
 
 std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, int mount_id) {
     try {
-        if (base::ReadFile(folder / kMarkName) != MarkText(mount_id)) {
+        if (base::ReadFile(folder / kMarkerName) != MarkerText(mount_id)) {
             return std::nullopt;
         }
         return MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY));
@@ -89,10 +89,10 @@ std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder
     }
 }
 
-bool MountFolder::IsUnmarked(const std::filesystem::path& folder) {
+bool MountFolder::HasNoMarker(const std::filesystem::path& folder) {
     struct stat status {};
     return ::stat(folder.c_str(), &status) == 0 && S_ISDIR(status.st_mode) &&
-           ::lstat((folder / kMarkName).c_str(), &status) != 0 && errno == ENOENT;
+           ::lstat((folder / kMarkerName).c_str(), &status) != 0 && errno == ENOENT;
 }
 
 MountFolder::MountFolder(std::filesystem::path path, base::FileDescriptor folder)
@@ -102,7 +102,7 @@ MountFolder::MountFolder(std::filesystem::path path, base::FileDescriptor folder
 MountSpace MountFolder::Space() const {
     struct statvfs status {};
     if (::fstatvfs(folder_.Get(), &status) != 0) {
-        base::ThrowErrno("cannot ask for the room on " + path_.string());
+        base::ThrowErrno("cannot find out the free space on " + path_.string());
     }
     const auto block = static_cast<std::int64_t>(status.f_frsize);
     return {static_cast<std::int64_t>(status.f_blocks) * block, static_cast<std::int64_t>(status.f_bavail) * block};
@@ -144,7 +144,7 @@ bool MountFolder::Renumber(const archive::FileName& name, int event) const {
                 return false;
             }
             if (errno == ENOENT && each.kind == archive::FileKind::kIndex) {
-                continue;  // it is made anew when it is missing
+                continue;  // a missing index is rebuilt
             }
             base::ThrowErrno("cannot rename " + (path_ / archive::PathOf(each)).string());
         }

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The folder of a storage mount, and the only hands that remove anything from it.
+// The folder of a storage mount, and the only code that removes anything from it.
 //
-// Why so        A disk that is not mounted leaves an empty folder that looks like a mount whose recordings are gone, and
-//               rows must not be dropped for that. So a mount carries a mark, the file .lookhaven-mount.
-// Invariants    (1) Nothing but the files of archive/layout.h is ever removed, and folders that became empty.
-//               (2) Everything is reached from the mount's own descriptor, by components that are no symbolic links: no
-//               call leaves the mount.
+// Why so        A disk that is not mounted leaves an empty folder, which looks like a mount whose recordings are gone;
+//               rows must not be removed for that. So a mount carries a marker, the file .lookhaven-mount.
+// Invariants    (1) Only the files of archive/layout.h are ever removed, and folders that became empty.
+//               (2) Everything is opened relative to the mount's own descriptor and without following symbolic links:
+//               no call leaves the mount.
 #pragma once
 
 #include <cstdint>
@@ -22,43 +22,44 @@ namespace lookhaven::maintenance {
 
 struct MountSpace {
     std::int64_t total_bytes = 0;
-    std::int64_t free_bytes = 0;  // for us
+    std::int64_t free_bytes = 0;  // available to this process, not to root
 
-    // Recording leaves so much free; a fiftieth, 2 MiB … 512 MiB.
+    // What recording leaves free: a fiftieth of the disk, 2 MiB … 512 MiB.
     std::int64_t ReserveBytes() const;
 };
 
 class MountFolder {
   public:
-    // Puts the mark of mount id into the folder; another mount's mark is replaced. Throws std::system_error.
-    static void Mark(const std::filesystem::path& folder, int mount_id);
+    // Makes the folder that of the mount; the marker of another mount is replaced. Throws std::system_error.
+    static void WriteMarker(const std::filesystem::path& folder, int mount_id);
 
-    // The folder, or nothing when it is missing or does not carry that mount's mark: the disk is not there.
+    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted.
     static std::optional<MountFolder> Open(const std::filesystem::path& folder, int mount_id);
-    // It is there and carries no mark at all.
-    static bool IsUnmarked(const std::filesystem::path& folder);
+    // The folder exists and has no mount's marker. False, too, when the folder is missing.
+    static bool HasNoMarker(const std::filesystem::path& folder);
 
     const std::filesystem::path& Path() const { return path_; }
     // Throws std::system_error.
     MountSpace Space() const;
 
-    // Something of the camera was recorded on that UTC day.
+    // Whether anything of the camera was recorded on that UTC day.
     bool HasDay(int camera, std::int64_t second) const { return static_cast<bool>(OpenDay(camera, second)); }
-    // A regular file lies there.
+    // Whether it exists, as a regular file.
     bool Has(const archive::FileName& name) const;
-    // Removes a recording with its index, or the file itself for another kind; false when nothing of it was there.
-    // Throws std::system_error.
+    // Removes the file, and a recording's index with it. False when neither existed. Throws std::system_error; then the
+    // recording may be gone already and its index not.
     bool Remove(const archive::FileName& name) const;
-    // Gives a recording and its index another event's number. False when that name is taken. Throws std::system_error.
+    // Renames a recording and its index to another event's id. False when that name is taken. Throws std::system_error.
     bool Renumber(const archive::FileName& name, int event) const;
-    // Removes the day's folder when no file but the recording log is left in it, and the camera's when that was its last.
+    // Removes the day's folder, with its recording log, when nothing else is left in it; and the camera's folder when
+    // it is empty then.
     void RemoveDayIfEmpty(int camera, std::int64_t day_s) const;
 
     struct File {
         archive::FileName name;
-        std::int64_t changed_s = 0;
+        std::int64_t changed_s = 0;  // modification time
     };
-    // All files of ours from that second's day on, in no order; what is unknown is left out. Throws std::system_error.
+    // All files that archive/layout.h knows, of that second's UTC day and later, in no order. Throws std::system_error.
     std::vector<File> Files(std::int64_t from_s = 0) const;
 
   private:

@@ -15,25 +15,25 @@ namespace {
 
 constexpr std::int64_t kDayS = 86'400;
 
-// Trouble with one file must not keep the others from being saved.
+// Trouble with one file must not keep the others from being recovered.
 template <class Work>
-void LogDone(Work&& work) {
+void LogOutcome(Work&& work) {
     try {
-        if (const Sentence done = work(); !done.empty()) {
+        if (const std::string done = work(); !done.empty()) {
             base::LogInfo(done);
         }
     } catch (const store::StoreError&) {
         throw;
     } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot tidy up: ") + failure.what());
+        base::LogWarning(std::string("cannot recover a recording: ") + failure.what());
     }
 }
 
-void TakeInRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_own_id, std::int64_t now_s) {
+void AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_own_id, std::int64_t now_s) {
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
         if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_own_id &&
             !events.Find(file.name.event)) {
-            LogDone([&] { return AdoptRecording(events, mount, mount_id, file.name, first_own_id); });
+            LogOutcome([&] { return AdoptRecording(events, mount, mount_id, file.name, first_own_id); });
         }
     }
 }
@@ -48,23 +48,23 @@ void Recover(store::Store& store, int first_own_id, std::int64_t now_s) {
             mounts.emplace(mount.id, std::move(*folder));
         }
     }
-    std::set<int> away;
+    std::set<int> unmounted;
     for (const store::Event& row : events.Open()) {
         const auto mount = mounts.find(row.mount_id);
         if (row.id >= first_own_id || row.demo) {
             continue;
         }
         if (mount == mounts.end()) {
-            away.insert(row.mount_id);
+            unmounted.insert(row.mount_id);
             continue;
         }
-        LogDone([&] { return CloseEvent(events, mount->second, row); });
+        LogOutcome([&] { return CloseEvent(events, mount->second, row); });
     }
-    for (const int id : away) {
-        base::LogWarning("mount " + std::to_string(id) + " is not there; its open events wait for it");
+    for (const int id : unmounted) {
+        base::LogWarning("mount " + std::to_string(id) + " is not mounted; its open events are closed once it is");
     }
     for (const auto& [id, mount] : mounts) {
-        TakeInRecent(events, mount, id, first_own_id, now_s);
+        AdoptRecent(events, mount, id, first_own_id, now_s);
     }
 }
 

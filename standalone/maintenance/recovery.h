@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder does first: it tidies up what an earlier one left open.
+// What the recorder does at its start: it closes what an earlier one left open.
 #pragma once
 
 #include <cstdint>
@@ -9,10 +9,9 @@
 
 namespace lookhaven::maintenance {
 
-// Closes events that were left open behind their last good frame, removes rows whose file is gone while its mount is
-// there, and takes in recordings of today and yesterday that never got a row. Looks at nothing with first_own_id or a
-// later id, which the caller is recording. Logs what it did. Throws store::StoreError; trouble with one file is logged
-// and leaves the others.
+// Closes open events after their last good frame, removes rows whose file is missing although the mount is mounted, and
+// adopts recordings of today and yesterday that never got a row. Ignores ids from first_own_id on: the caller is
+// recording them. Logs what it did. Throws store::StoreError; trouble with one file is logged and leaves the others.
 void Recover(store::Store& store, int first_own_id, std::int64_t now_s);
 
 }  // namespace lookhaven::maintenance

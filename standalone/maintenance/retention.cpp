@@ -28,24 +28,25 @@ class Retention {
           mounts_(store),
           now_s_(now_s) {}
 
-    Removed Run() {
+    RetentionResult Run() {
         excess_bytes_ = Excess();
-        for (bool goes_on = true; goes_on;) {
+        for (bool has_more = true; has_more;) {
             const std::vector<store::Event> oldest = events_.Oldest(mount_.id, kEventsAtOnce);
-            const int before = removed_.events;
+            const int before = deleted_.events;
             for (const store::Event& event : oldest) {
-                if (!MustGo(event)) {
-                    return removed_;
+                // The limits are the mount's, so no younger event exceeds them either.
+                if (!IsExpired(event) && deleted_.bytes >= excess_bytes_) {
+                    return deleted_;
                 }
-                RemoveEvent(event);
+                Delete(event);
             }
-            goes_on = oldest.size() == kEventsAtOnce && removed_.events > before;
+            has_more = oldest.size() == kEventsAtOnce && deleted_.events > before;
         }
-        return removed_;
+        return deleted_;
     }
 
   private:
-    // Bytes that have to go whatever their age.
+    // Bytes to delete whatever their age.
     std::int64_t Excess() {
         std::int64_t excess = 0;
         if (mount_.max_bytes > 0) {
@@ -58,22 +59,23 @@ class Retention {
         return excess;
     }
 
-    bool MustGo(const store::Event& event) const {
-        return removed_.bytes < excess_bytes_ || (mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s);
+    // How long an event is kept is decided here and nowhere else.
+    bool IsExpired(const store::Event& event) const {
+        return mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s;
     }
 
-    void RemoveEvent(const store::Event& event) {
+    void Delete(const store::Event& event) {
         const std::optional<archive::FileName> name = archive::ParsePath(event.path);
         events_.Remove(std::array{event.id});
-        ++removed_.events;
-        removed_.bytes += event.size_bytes;
+        ++deleted_.events;
+        deleted_.bytes += event.size_bytes;
         if (!name || name->kind != archive::FileKind::kRecording) {
             base::LogWarning("the path of event " + std::to_string(event.id) + " names no recording: left alone");
             return;
         }
         folder_.Remove(*name);
         RemoveMarks(event);
-        Forget(event);
+        ClearRecordingLog(event);
         if (archive::DayOf(event.start_s) < archive::DayOf(now_s_)) {
             folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
         }
@@ -95,13 +97,13 @@ class Retention {
             }
             if (RemoveSpan(mark)) {
                 marks_.Remove(mark.id);
-                ++removed_.marks;
+                ++deleted_.marks;
             }
         }
     }
 
-    // False while the mount that holds the span file is not there. The row may go after the file here: a mark without
-    // footage has nothing to show either way.
+    // False while the mount that holds the span file is not mounted. Here the row is removed after the file: without
+    // footage the mark has nothing to show either way.
     bool RemoveSpan(const store::Mark& mark) {
         const std::optional<archive::FileName> name = archive::ParsePath(mark.path);
         if (mark.state != store::MarkState::kSaved || !name || name->kind != archive::FileKind::kSpan) {
@@ -120,8 +122,8 @@ class Retention {
         return folder.has_value();
     }
 
-    // The recording log says what can be played; a second that the next event shares stays.
-    void Forget(const store::Event& event) {
+    // The recording log says what can be played: seconds that other events share stay.
+    void ClearRecordingLog(const store::Event& event) {
         const std::filesystem::path camera = folder_.Path() / std::to_string(event.camera_id);
         std::int64_t end_s = event.end_s;
         while (end_s > event.start_s && HasFootage(event.camera_id, end_s - 1, end_s)) {
@@ -137,7 +139,7 @@ class Retention {
         try {
             archive::WriteRecordingLog(camera, begin_s, end_s, 0);
         } catch (const std::system_error& failure) {
-            base::LogWarning(std::string("the recording log keeps what is gone: ") + failure.what());
+            base::LogWarning(std::string("the recording log still shows deleted footage: ") + failure.what());
         }
     }
 
@@ -148,14 +150,14 @@ class Retention {
     store::Mounts mounts_;
     const std::int64_t now_s_;
     std::int64_t excess_bytes_ = 0;
-    Removed removed_;
+    RetentionResult deleted_;
 };
 
 }  // namespace
 
-Removed Retain(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
+RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
     const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
-    return folder ? Retention(store, mount, *folder, now_s).Run() : Removed{};
+    return folder ? Retention(store, mount, *folder, now_s).Run() : RetentionResult{};
 }
 
 }  // namespace lookhaven::maintenance

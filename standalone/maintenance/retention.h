@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Removes the oldest recordings of a mount so that it keeps within its age, its size and its disk.
+// Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
 //
-// Invariants    (1) What goes is named by a row: a store that knows nothing removes nothing, and unknown files stay.
-//               (2) The row goes before its file, so that no row points at nothing; what a crash leaves in between is a file
-//                   without a row, which verify finds.
-//               (3) Archived events, events that grow and mounts that are not there are left alone.
-//               (4) A mark goes with the last of its footage.
+// Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
+//               (2) The row is removed before its file, so that no row points at a missing file; a crash in between
+//                   leaves a file without a row, which verify finds.
+//               (3) Archived and growing events and those on unmounted mounts are kept.
+//               (4) A mark is removed with the last of its footage.
 // Thread safety One thread.
 #pragma once
 
@@ -17,15 +17,17 @@
 
 namespace lookhaven::maintenance {
 
-struct Removed {
+// What was deleted.
+struct RetentionResult {
     int events = 0;
     int marks = 0;
     std::int64_t bytes = 0;
 };
 
-// Removes what is too old and, the oldest first, what is too much: above the mount's own limit, or so much that less
-// than twice the reserve of the disk is free; then three times the reserve are made free. Nothing happens on a mount
-// that is not there. Throws store::StoreError, std::system_error.
-Removed Retain(store::Store& store, const store::Mount& mount, std::int64_t now_s);
+// Deletes events that are older than the mount's age limit. Then, the oldest first, as many as exceed its size limit,
+// or as are needed to have three times the disk's reserve free once less than twice the reserve is. The result is empty
+// for a mount that is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says
+// nothing about others: the events deleted until then stay deleted.
+RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s);
 
 }  // namespace lookhaven::maintenance

@@ -13,20 +13,14 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-store::VideoType TypeOf(const std::string& codec) {
-    return codec == "H264"   ? store::VideoType::kH264
-           : codec == "H265" ? store::VideoType::kH265
-                             : store::VideoType::kMjpeg;
-}
-
-// A whole second at least, for an event that takes no time touches no span of time.
+// At least a whole second: a search never finds an event without a duration.
 std::int64_t EndOf(std::int64_t start_s, std::int64_t duration_ms) {
-    const std::int64_t seconds = std::clamp<std::int64_t>((duration_ms + 999) / 1000, 1, store::kMaxEventSeconds);
+    const std::int64_t seconds = std::clamp<std::int64_t>((duration_ms + 999) / 1000, 1, base::kMaxRecordingSeconds);
     return start_s + seconds;
 }
 
-// Nobody else's file looks like this: empty, or with our head and no frame behind it.
-bool IsBarelyBegun(const std::filesystem::path& recording) {
+// Empty, or a head of ours without a frame: no other program leaves such a file.
+bool HasOurHeadOnly(const std::filesystem::path& recording) {
     if (std::filesystem::file_size(recording) == 0) {
         return true;
     }
@@ -40,11 +34,11 @@ bool IsBarelyBegun(const std::filesystem::path& recording) {
     }
 }
 
-// A file without a frame goes where it is ours without doubt.
-Sentence Discard(const MountFolder& mount, const archive::FileName& name) {
+// Removes a file without a frame if it is certainly ours.
+std::string Discard(const MountFolder& mount, const archive::FileName& name) {
     const std::string path = (mount.Path() / archive::PathOf(name)).string();
-    if (!IsBarelyBegun(path)) {
-        return "left " + path + " alone: it holds nothing that could be a recording of ours";
+    if (!HasOurHeadOnly(path)) {
+        return "left " + path + " alone: it holds no recording of ours";
     }
     mount.Remove(name);
     return "removed " + path + ", which holds no frame";
@@ -60,10 +54,10 @@ store::Event RowOf(const archive::FileName& name, int mount_id, const archive::C
     row.mount_id = mount_id;
     row.start_s = name.start_s;
     row.end_s = EndOf(name.start_s, contents.duration_ms);
-    row.reason = header.reason == store::kReasonAlarm ? store::kReasonAlarm : store::kReasonContinuous;
+    row.reason = header.reason == base::kReasonAlarm ? base::kReasonAlarm : base::kReasonContinuous;
     row.frame_count = contents.frame_count;
     row.size_bytes = static_cast<std::int64_t>(contents.size_bytes);
-    row.video_type = TypeOf(header.codec);
+    row.video_type = base::CodecNamed(header.codec).value_or(base::Codec::kMjpeg);
     row.audio_codec = header.audio_codec;
     row.width = header.width;
     row.height = header.height;
@@ -71,7 +65,7 @@ store::Event RowOf(const archive::FileName& name, int mount_id, const archive::C
     return row;
 }
 
-Sentence CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row) {
+std::string CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row) {
     const std::filesystem::path path = mount.Path() / row.path;
     const std::optional<archive::FileName> name = archive::ParsePath(row.path);
     if (!name || !mount.Has(*name)) {
@@ -85,11 +79,11 @@ Sentence CloseEvent(store::Events& events, const MountFolder& mount, const store
     }
     const store::Event whole = RowOf(*name, row.mount_id, contents);
     events.Finish(row.id, whole.end_s, whole.frame_count, whole.size_bytes);
-    return "closed " + path.string() + " behind its last good frame";
+    return "closed " + path.string() + " after its last good frame";
 }
 
-Sentence AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                        int known_id) {
+std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
+                           int known_id) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     if (contents.frame_count == 0) {
         return Discard(mount, name);
@@ -98,7 +92,7 @@ Sentence AdoptRecording(store::Events& events, const MountFolder& mount, int mou
     if (name.event > known_id) {
         kept.event = events.NextId();
         if (!mount.Renumber(name, kept.event)) {
-            return "left " + archive::PathOf(name) + " alone: the name of its new number is taken";
+            return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";
         }
     }
     events.Begin(RowOf(kept, mount_id, contents));

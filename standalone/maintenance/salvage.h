@@ -13,21 +13,20 @@
 
 namespace lookhaven::maintenance {
 
-// The row that the recording should have.
+// The row that the recording should have; the reason is continuous when the file does not say.
 store::Event RowOf(const archive::FileName& name, int mount_id, const archive::Contents& contents);
 
-// What was done, in a sentence with the recording's path; empty when all was well.
-using Sentence = std::string;
+// Both return what was done, as a sentence with the recording's path.
 
-// Closes the recording of a row that was left open, or whose file or index says something else. A row whose file is gone
-// is removed, and one whose file holds nothing, with the file. Throws archive::ArchiveError when the recording is still
-// being written, store::StoreError, std::system_error.
-Sentence CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row);
+// Finishes the recording of a row that was left open or disagrees with its file or index, and the row. Removes a row
+// whose file is missing; also one whose file holds no frame, with the file. Throws std::system_error, EBUSY while the
+// recording is still being written; store::StoreError.
+std::string CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row);
 
-// Gives a recording that has no row one, or removes what is left of a recording that never got as far as a frame. ids
-// up to known_id were given out by this store; a recording with a later one is renumbered. What is no recording after
-// all is left alone, which the sentence says. Throws as CloseEvent.
-Sentence AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                        int known_id);
+// Gives a recording without a row one, or removes a file that never got as far as its first frame. This store has given
+// out ids up to known_id; a recording with a later one gets a new id. A file that is no recording of ours is left
+// alone, which the sentence says. Throws as CloseEvent.
+std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
+                           int known_id);
 
 }  // namespace lookhaven::maintenance

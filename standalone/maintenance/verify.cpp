@@ -23,17 +23,18 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-// A recorder's new file has its index and its row well within this.
-constexpr std::int64_t kFreshS = 10;
+// A recorder's new file has its index and its row well before it is this old.
+constexpr std::int64_t kMinAgeS = 10;
 
 using Frames = std::vector<archive::FrameEntry>;
 
-// How a recording and its index stand to each other.
+// Whether a recording and its index agree.
 struct Inspection {
     std::string problem;  // empty when they agree
     bool is_growing = false;
-    bool must_be_rebuilt = false;  // the index says it is whole, and is wrong
-    bool is_lost_within = false;   // the recording is damaged in the middle; what the index names is still there
+    bool must_rebuild_index = false;  // the index claims to be complete, and is wrong
+    bool is_damaged_inside =
+        false;  // damage in the middle; the frames after it, which the index names, may still be read
     std::int64_t frames = 0;
 };
 
@@ -63,7 +64,7 @@ Inspection Inspect(const std::filesystem::path& path) {
         }
     } catch (const std::exception& failure) {
         result.problem = std::string("an index cannot be used: ") + failure.what();
-        result.must_be_rebuilt = true;
+        result.must_rebuild_index = true;
         return result;
     }
     result.frames = static_cast<std::int64_t>(indexed.size());
@@ -76,12 +77,12 @@ Inspection Inspect(const std::filesystem::path& path) {
     if (found == indexed && result.problem.empty()) {
         return result;
     }
-    result.is_lost_within = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());
-    result.must_be_rebuilt = !result.is_lost_within;
+    result.is_damaged_inside = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());
+    result.must_rebuild_index = !result.is_damaged_inside;
     if (result.problem.empty()) {
-        result.problem = result.is_lost_within ? "the recording " + path.string() + " is damaged behind frame " +
-                                                     std::to_string(found.size())
-                                               : "the index of " + path.string() + " does not name its frames";
+        result.problem = result.is_damaged_inside ? "the recording " + path.string() + " is damaged behind frame " +
+                                                        std::to_string(found.size())
+                                                  : "the index of " + path.string() + " does not name its frames";
     }
     return result;
 }
@@ -109,7 +110,7 @@ class Verification {
         std::vector<store::Event> rows;
         events_.VisitMount(mount.id, [&](const store::Event& event) { rows.push_back(event); });
         std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
-        if (!folder && rows.empty() && MountFolder::IsUnmarked(mount.path)) {
+        if (!folder && rows.empty() && MountFolder::HasNoMarker(mount.path)) {
             return;  // nothing was recorded yet
         }
         if (!folder) {
@@ -157,7 +158,7 @@ class Verification {
             return;
         }
         if (!mount.Has(*name)) {
-            // Retention may have been quicker.
+            // Retention may have removed it meanwhile.
             if (events_.Find(row.id)) {
                 Report("event " + std::to_string(row.id) + " has no file: " + path,
                        [&] { return CloseEvent(events_, mount, row); });
@@ -170,13 +171,13 @@ class Verification {
             return;
         }
         if (!found.problem.empty()) {
-            Report(found.problem, [&] { return Mend(mount, row, found); });
+            Report(found.problem, [&] { return Repair(mount, row, found); });
         } else if (row.recording || row.frame_count != found.frames) {
             CheckProgress(mount, row);
         }
     }
 
-    // The row may have gone on since it was read.
+    // The recorder may have updated the row since it was read.
     void CheckProgress(const MountFolder& mount, const store::Event& before) {
         const std::optional<store::Event> row = events_.Find(before.id);
         const Inspection found = Inspect(mount.Path() / before.path);
@@ -186,11 +187,11 @@ class Verification {
         }
     }
 
-    std::string Mend(const MountFolder& mount, const store::Event& row, const Inspection& found) {
-        if (found.is_lost_within) {
+    std::string Repair(const MountFolder& mount, const store::Event& row, const Inspection& found) {
+        if (found.is_damaged_inside) {
             return "";
         }
-        if (found.must_be_rebuilt) {
+        if (found.must_rebuild_index) {
             RemoveIndex(mount, *archive::ParsePath(row.path));
         }
         return CloseEvent(events_, mount, row);
@@ -208,7 +209,7 @@ class Verification {
                     archive::ReadSpan(mount.Path() / mark.path);
                 } catch (const std::exception& failure) {
                     Report("the span of mark " + std::to_string(mark.id) + " cannot be read: " + failure.what(),
-                           [&] { return SaveMark(store_, mark) ? "written anew" : ""; });
+                           [&] { return SaveMark(store_, mark) ? "written again" : ""; });
                 }
             });
         }
@@ -222,9 +223,9 @@ class Verification {
         for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
             expected.insert(mark.path);
         }
-        const std::int64_t fresh_s = base::WallMillis() / 1000 - kFreshS;
+        const std::int64_t newest_s = base::WallMillis() / 1000 - kMinAgeS;
         for (const MountFolder::File& file : mount.Files()) {
-            if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < fresh_s) {
+            if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < newest_s) {
                 Try([&] { CheckStray(mount, mount_id, file.name, rows.empty()); });
             }
         }
@@ -255,7 +256,7 @@ class Verification {
         }
     }
 
-    // An event that was begun after the rows were read.
+    // True for an event that began after the rows were read.
     bool HasRow(const archive::FileName& name) {
         const std::optional<store::Event> row = events_.Find(name.event);
         return row && row->path == archive::PathOf(name);
@@ -266,7 +267,7 @@ class Verification {
         return marks.Find(store::MarkKind::kAlert, id) || marks.Find(store::MarkKind::kPos, id);
     }
 
-    // Only what this store gave a number to is known to be of no use.
+    // A file with an id that this store never gave out may belong to another store: left alone.
     std::string RemoveStray(const MountFolder& mount, const archive::FileName& name, bool store_is_empty) const {
         if (store_is_empty || name.event > known_id_) {
             return "";

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells the units of an Annex B stream apart, and keeps parameter sets in front of its key frames.
+// Recognises the NAL units of an Annex B stream, and puts parameter sets in front of its key frames.
 //
-// Why so        A viewer starts at any key frame, but many cameras send their parameter sets once, or only in their
-//               description of the session.
+// Why so        A viewer starts at any key frame, but many cameras send their parameter sets only once, or only in the
+//               session description.
 #pragma once
 
 #include <cstdint>
@@ -14,19 +14,19 @@
 
 namespace lookhaven::media {
 
-// The frame holds a picture that needs no other.
+// Whether the frame can be decoded without any other.
 bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame);
 
-// The piece of a stream begins with what may stand at the beginning of a picture: its first slice, or what precedes it.
+// Whether a piece of the stream may begin a picture: it begins with a first slice, or with a unit that precedes one.
 bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece);
 
 class ParameterSets {
   public:
-    // The codec is kH264 or kH265; initial holds the sets known so far, as Annex B, or nothing.
+    // codec: kH264 or kH265. initial: the sets known so far, as Annex B; may be empty.
     ParameterSets(Codec codec, std::span<const std::uint8_t> initial);
 
-    // The key frame behind its parameter sets: the frame itself when it brings them, which makes them the current ones,
-    // else a copy that is valid until the next call.
+    // The key frame with its parameter sets in front. A frame that contains them is returned as it is, and its sets
+    // become the current ones; else a copy, valid until the next call.
     std::span<const std::uint8_t> Complete(std::span<const std::uint8_t> key_frame);
 
     // The current sets as Annex B; empty while there are none.

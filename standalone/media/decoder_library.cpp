@@ -10,22 +10,21 @@ namespace lookhaven::media {
 
 namespace {
 
-Codec CodecOfName(std::string_view name) {
-    for (const Codec codec : {Codec::kMjpeg, Codec::kH264, Codec::kH265}) {
-        if (name == CodecName(codec)) {
-            return codec;
-        }
+Codec VideoCodecNamed(std::string_view name) {
+    const std::optional<Codec> codec = base::CodecNamed(name);
+    if (!codec || !base::IsVideo(*codec)) {
+        throw SourceError("no decoder for " + std::string(name));
     }
-    throw SourceError("no decoder for " + std::string(name));
+    return *codec;
 }
 
 class Library : public DecoderLibrary {
   public:
     std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const override {
-        return JpegOfKeyFrame(CodecOfName(codec), frame);
+        return JpegOfKeyFrame(VideoCodecNamed(codec), frame);
     }
     std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const override {
-        return OpenFrameDecoder(CodecOfName(codec), threads);
+        return OpenFrameDecoder(VideoCodecNamed(codec), threads);
     }
 };
 

@@ -47,7 +47,7 @@ std::span<const std::uint8_t> Bytes(const AVPacket& packet) {
     return {packet.data, static_cast<std::size_t>(packet.size)};
 }
 
-// What can be told of G.711 is its name, so it must be the usual one.
+// Viewers learn only the name of G.711, not its rate and channels, so these must be the usual ones.
 bool IsUsualForm(Codec codec, const AVCodecParameters& parameters) {
     switch (codec) {
     case Codec::kAac:
@@ -89,7 +89,7 @@ void Demuxer::ChooseVideo(Framing framing) {
     }
     const AVStream& stream = *input_->streams[video_index_];
     const std::optional<Codec> codec = CodecOf(stream.codecpar->codec_id);
-    if (!codec || *codec > Codec::kH265) {
+    if (!codec || !base::IsVideo(*codec)) {
         throw SourceError(std::string("sends pictures as ") + avcodec_get_name(stream.codecpar->codec_id) +
                           ", which is not supported");
     }
@@ -110,7 +110,7 @@ void Demuxer::ChooseVideo(Framing framing) {
     parser_->flags |= PARSER_FLAG_COMPLETE_FRAMES;
 }
 
-// Sound in an unknown codec is left out: the picture alone is better than nothing.
+// Sound in an unknown codec is ignored: a silent picture is better than none.
 void Demuxer::ChooseAudio() {
     const int index = av_find_best_stream(input_.get(), AVMEDIA_TYPE_AUDIO, -1, video_index_, nullptr, 0);
     if (index < 0) {
@@ -156,7 +156,7 @@ std::optional<Packet> Demuxer::Take() {
     } else if (video_.width > 0) {
         packet = Packet{Medium::kAudio, Bytes(*packet_), time_us, true, &*audio_};
     }
-    if (!packet || packet->data.empty() || packet->data.size() > kMaxFrameBytes) {
+    if (!packet || packet->data.empty() || packet->data.size() > base::kMaxFrameBytes) {
         return std::nullopt;
     }
     if (is_video) {
@@ -165,7 +165,7 @@ std::optional<Packet> Demuxer::Take() {
     return packet;
 }
 
-// Bare streams of frames have no times: their frames follow each other at the rate that they name, or at 25 a second.
+// Raw streams carry no times: frames follow each other at the rate that the stream names, or at 25 per second.
 std::int64_t Demuxer::TimeOfPacket() {
     constexpr std::int64_t kUsualFrameUs = 40'000;
     const AVRational unit = input_->streams[packet_->stream_index]->time_base;
@@ -183,7 +183,7 @@ std::optional<Packet> Demuxer::TakeVideo(std::int64_t time_us) {
     }
     if (video_filter_ != nullptr && (av_bsf_send_packet(video_filter_.get(), packet_.get()) < 0 ||
                                      av_bsf_receive_packet(video_filter_.get(), packet_.get()) < 0)) {
-        return std::nullopt;  // one broken frame
+        return std::nullopt;  // one damaged frame
     }
     return CompleteFrame(Bytes(*packet_), time_us);
 }
@@ -200,7 +200,7 @@ std::optional<Packet> Demuxer::CompleteFrame(std::span<const std::uint8_t> frame
     return video_.width > 0 ? std::optional(packet) : std::nullopt;
 }
 
-// Sizes come from the frames themselves, since descriptions are often missing and sometimes wrong.
+// Sizes are taken from the frames, since session descriptions often lack them and are sometimes wrong.
 bool Demuxer::LearnFormat(std::span<const std::uint8_t> frame) {
     if (!parameter_sets_) {
         const std::optional<PictureSize> size = JpegSize(frame);

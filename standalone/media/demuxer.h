@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Takes a container or an RTSP session apart into the frames of its first picture stream and its first sound stream.
+// Demultiplexes a container or an RTSP session into the frames of its best video and its best audio stream.
 #pragma once
 
 #include <cstdint>
@@ -16,16 +16,16 @@ namespace lookhaven::media {
 
 class Demuxer {
   public:
-    // How frames come out of the input: whole, or in pieces with times.
+    // How the input delivers frames: whole, or in pieces that each have a time.
     enum class Framing { kWhole, kPieces };
 
-    // The deadline must outlive the demuxer, which asks it in every wait. Throws SourceError.
+    // The deadline must outlive the demuxer; it ends every wait. Throws SourceError.
     Demuxer(const std::string& url, AvOptions& options, Deadline& deadline, Framing framing);
 
     const std::optional<StreamFormat>& Audio() const { return audio_; }
 
-    // The next frame, its time in the source's own microseconds, or nothing at the end. Frames before the first key
-    // frame and frames of no or too large a size are left out. Throws SourceError.
+    // The next frame, its time in microseconds of the source's own clock; nothing at the end. Drops frames before the
+    // first key frame, empty ones and those above base::kMaxFrameBytes. Throws SourceError.
     std::optional<Packet> Read();
 
   private:
@@ -42,8 +42,8 @@ class Demuxer {
     AvPtr<AVPacket> packet_;
     int video_index_ = -1;
     int audio_index_ = -1;
-    AvPtr<AVBSFContext> video_filter_;         // of H.264 and H.265 that comes whole
-    std::optional<FrameAssembler> assembler_;  // of H.264 and H.265 that comes in pieces
+    AvPtr<AVBSFContext> video_filter_;         // for H.264 and H.265 in whole frames
+    std::optional<FrameAssembler> assembler_;  // for H.264 and H.265 in pieces
     AvPtr<AVCodecContext> parser_codec_;
     AvPtr<AVCodecParserContext> parser_;
     std::optional<ParameterSets> parameter_sets_;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A recording, played over and over at its own pace.
+// A video file, played in a loop at its own pace.
 #include <filesystem>
 
 #include "standalone/base/clock.h"
@@ -19,7 +19,7 @@ class FileLoop : public Source {
     FileLoop(std::string path, const SourceOptions& options, std::stop_token stop)
         : path_(std::move(path)),
           deadline_(std::move(stop), options.no_data_limit) {
-        // A pipe or a device could block for ever, and would not play twice.
+        // A pipe or a device could block forever, and would not play twice.
         if (!std::filesystem::is_regular_file(path_)) {
             throw SourceError("is no regular file");
         }
@@ -39,7 +39,7 @@ class FileLoop : public Source {
             throw SourceError("holds no whole frame");
         }
         if (!offset_us_) {
-            // Each round begins one frame's time behind the last, or at once when that has passed.
+            // Each round begins one frame's duration after the last, or now when that has passed.
             offset_us_ = std::max(base::MonotonicMicros(), last_us_ + kGapBetweenRoundsUs) - packet->timestamp_us;
         }
         packet->timestamp_us += *offset_us_;
@@ -51,7 +51,7 @@ class FileLoop : public Source {
     }
 
   private:
-    // Only containers that hold their media themselves: a play list could name any file of the machine.
+    // Only containers that hold their media themselves: a playlist could name any file of the machine.
     void Open() {
         AvOptions options;
         options.Set("protocol_whitelist", "file")

@@ -12,13 +12,13 @@ std::optional<FrameAssembler::Frame> FrameAssembler::Add(std::span<const std::ui
     std::optional<Frame> frame;
     if (time_us != pending_time_us_ && MayBeginPicture(codec_, piece)) {
         whole_ = std::exchange(pending_, {});
-        if (!whole_.empty() && whole_.size() <= kMaxFrameBytes) {
+        if (!whole_.empty() && whole_.size() <= base::kMaxFrameBytes) {
             frame = Frame{whole_, pending_time_us_};
         }
         pending_time_us_ = time_us;
     }
-    // One byte too many is remembered, and no more.
-    const std::size_t room = kMaxFrameBytes + 1 - pending_.size();
+    // At most one byte too many is kept, which marks the picture as too large.
+    const std::size_t room = base::kMaxFrameBytes + 1 - pending_.size();
     const auto taken = piece.first(std::min(room, piece.size()));
     pending_.insert(pending_.end(), taken.begin(), taken.end());
     return frame;

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Puts the frames of an Annex B stream together from the pieces in which RTP brings them.
+// Assembles the frames of an Annex B stream from the pieces that RTP delivers.
 //
-// Why so        libav's parser cuts a picture in two where a camera repeats its parameter sets between the slices, and
-//               the time alone may jump inside a picture, when the camera corrects its clock. A new picture is where
-//               both the time and the bytes say so.
+// Why so        libav's parser splits a picture where a camera repeats its parameter sets between the slices, and the
+//               time alone may jump inside a picture when the camera corrects its clock. So a new picture begins only
+//               where both the time and the bytes say so.
 #pragma once
 
 #include <cstdint>
@@ -23,11 +23,11 @@ class FrameAssembler {
         std::int64_t time_us = 0;
     };
 
-    // The codec is kH264 or kH265.
+    // codec: kH264 or kH265.
     explicit FrameAssembler(Codec codec) : codec_(codec) {}
 
-    // Takes the next piece. When it begins a new picture, the one before is whole now and returned; a picture above
-    // kMaxFrameBytes is lost.
+    // Adds the next piece. When it begins a new picture, returns the previous one, which is complete now; drops a
+    // picture above base::kMaxFrameBytes.
     std::optional<Frame> Add(std::span<const std::uint8_t> piece, std::int64_t time_us);
 
   private:

@@ -113,7 +113,7 @@ AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads) {
     AvPtr<AVCodecContext> context = OwnAv(avcodec_alloc_context3(decoder));
     context->thread_count = threads;
     context->thread_type = FF_THREAD_FRAME;
-    context->max_pixels = std::int64_t{kMaxSidePixels} * kMaxSidePixels;
+    context->max_pixels = std::int64_t{base::kMaxSidePixels} * base::kMaxSidePixels;
     const base::BlockedSignals blocked;
     CheckAv(avcodec_open2(context.get(), decoder, nullptr), "cannot open the decoder");
     return context;

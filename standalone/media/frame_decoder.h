@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Decodes rows of frames with libavcodec.
+// Decodes sequences of frames with libavcodec.
 #pragma once
 
 #include <memory>
@@ -11,11 +11,11 @@
 
 namespace lookhaven::media {
 
-// A decoder that takes no picture larger than cameras send. One thread is the caller's own; of more, none takes signals.
-// Throws SourceError.
+// A decoder that refuses pictures above base::kMaxSidePixels. With one thread it works in the caller's own; threads
+// that it starts take no signals. Throws SourceError.
 AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads = 1);
 
-// Codec: H.264 or H.265. Throws SourceError.
+// codec: kH264 or kH265. Throws SourceError.
 std::unique_ptr<FrameDecoder> OpenFrameDecoder(Codec codec, int threads);
 
 }  // namespace lookhaven::media

@@ -7,20 +7,21 @@
 #include <optional>
 #include <span>
 
-namespace lookhaven::media {
+#include "standalone/base/video.h"
 
-// The largest width and height that cameras are taken with.
-constexpr int kMaxSidePixels = 8192;
+namespace lookhaven::media {
 
 struct PictureSize {
     int width = 0;
     int height = 0;
 
-    // Neither empty nor so large that it would claim memory beyond measure.
-    bool IsUsable() const { return width > 0 && height > 0 && width <= kMaxSidePixels && height <= kMaxSidePixels; }
+    // Neither empty nor larger than any camera's picture, which would allocate too much memory.
+    bool IsUsable() const {
+        return width > 0 && height > 0 && width <= base::kMaxSidePixels && height <= base::kMaxSidePixels;
+    }
 };
 
-// Nothing when the bytes are not the beginning of a JPEG picture of a usable size. Looks at no more than the header.
+// Nothing when the bytes do not begin a JPEG picture of a usable size. Reads the header only.
 std::optional<PictureSize> JpegSize(std::span<const std::uint8_t> jpeg);
 
 }  // namespace lookhaven::media

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Makes JPEG pictures of decoded frames.
+// Encodes decoded frames as JPEG pictures.
 //
-// Why so        JPEG has colours of its own: other coefficients and a range that most cameras do not use. Both are changed
-//               in one pass over the planes, which is cheaper than the way by RGB and loses nothing.
+// Why so        JPEG uses other colour coefficients and another range than most cameras. Both are converted in one pass
+//               over the planes, which is cheaper than going through RGB and loses nothing.
 #pragma once
 
 #include <cstddef>
@@ -42,7 +42,7 @@ class JpegEncoder {
     std::unique_ptr<void, int (*)(void*)> compressor_;
     std::unique_ptr<SwsContext, FreeScaler> scaler_;
     std::vector<std::uint8_t> planes_;
-    std::vector<std::int32_t> mix_;  // what a row's colours add to its brightness
+    std::vector<std::int32_t> mix_;  // what a row's chroma adds to its luma
     std::unique_ptr<std::uint8_t[]> jpeg_;
     std::size_t jpeg_bytes_ = 0;
 };

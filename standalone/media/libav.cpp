@@ -19,7 +19,7 @@ namespace lookhaven::media {
 namespace {
 
 // Twice the samples of a plane, for what stands around them.
-constexpr std::size_t kMaxBlockBytes = std::size_t{2} * kMaxSidePixels * kMaxSidePixels;
+constexpr std::size_t kMaxBlockBytes = std::size_t{2} * base::kMaxSidePixels * base::kMaxSidePixels;
 
 void WriteAvLog(void* object, int level, const char* format, va_list arguments) {
     if (level > AV_LOG_WARNING) {

@@ -30,7 +30,7 @@ struct AvDeleter {
 template <class T>
 using AvPtr = std::unique_ptr<T, AvDeleter>;
 
-// A dictionary of options as libav wants it: it takes out what it understands.
+// A dictionary of options for libav, which removes those that it understands.
 class AvOptions {
   public:
     AvOptions() = default;
@@ -51,7 +51,7 @@ class AvOptions {
 // Throws SourceError "<what>: <libav's text>" when the result of a libav call is negative; else returns it.
 int CheckAv(int result, std::string_view what);
 
-// Throws std::bad_alloc for null; else the object, owned.
+// Takes ownership of what a libav allocation returned; throws std::bad_alloc for null.
 template <class T>
 AvPtr<T> OwnAv(T* object) {
     if (object == nullptr) {
@@ -60,22 +60,22 @@ AvPtr<T> OwnAv(T* object) {
     return AvPtr<T>(object);
 }
 
-// Sends libav's log lines to ours, at debug level and with secrets taken out: whatever matters comes back as an error
-// too, and a broken camera would fill the log with a line per frame. Refuses libav any single block of memory that no
-// picture of kMaxSidePixels needs, whatever a camera claims. Does its work once per process.
+// Sends libav's log lines to ours, at debug level and without secrets: whatever matters is returned as an error too,
+// and a broken camera would fill the log with a line per frame. Limits libav's single allocations to what a picture of
+// base::kMaxSidePixels needs, whatever a camera claims. Only the first call in a process does anything.
 void PrepareAv();
 
-// Ends a blocking libav call at a stop request or when no picture came for too long.
+// Ends a blocking libav call on a stop request or when no picture came for too long.
 //
-// Why so        libav's own time-outs cover single reads, so a camera that sends a little now and then, or sound only,
-//               would hold a reader for ever; and the error code of an interrupted call does not say why it ended.
+// Why so        libav's own timeouts cover single reads, so a camera that sends a little now and then, or sound only,
+//               would block a reader forever; and the error code of an interrupted call does not say why it ended.
 class Deadline {
   public:
     Deadline(std::stop_token stop, std::chrono::milliseconds limit);
     Deadline(const Deadline&) = delete;
     Deadline& operator=(const Deadline&) = delete;
 
-    // A picture came: the limit counts from now.
+    // A picture came: the limit counts from now on.
     void Rearm();
 
     // Throws SourceError when stop was requested or the limit has passed.

@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What request processes need of libav, as shared libraries that only they load.
+// What request processes need of libav, as shared libraries that are loaded when needed.
 //
-// Why so        libav brings hundreds of mappings along, and each of them makes every fork dearer. A host that forks for
-//               each request loads such a library in the one request process that decodes or copies. There are two, since
-//               loading is most of the wait for a first picture, and decoding does well without libav's formats of files.
+// Why so        libav adds hundreds of memory mappings, and each makes every fork more expensive. So the host, which
+//               forks for each request, does without it, and only a request process that decodes or copies loads such a
+//               library. There are two, since loading is most of the wait for a first picture, and decoding needs none
+//               of libavformat.
 #pragma once
 
 #include <cstddef>
@@ -20,19 +21,19 @@
 
 namespace lookhaven::media {
 
-// Decodes a row of H.264 or H.265 frames and makes JPEG pictures of the ones that are asked for. To be used by one thread.
+// Decodes a sequence of H.264 or H.265 frames and encodes chosen pictures as JPEG. One thread.
 class FrameDecoder {
   public:
     virtual ~FrameDecoder() = default;
 
-    // Forgets what came; the next frame is a key frame.
+    // Discards all frames fed so far; the next one must be a key frame.
     virtual void Restart() = 0;
-    // Takes the next frame in the order of decoding, as Annex B or as it lies in a Matroska file, and a number for it; an
-    // empty frame means that no more come before Restart. A frame that cannot be decoded is passed over.
+    // Feeds the next frame in decoding order, as Annex B or as stored in a Matroska file, with a number that Take will
+    // return. An empty frame means that no more come before Restart. A frame that cannot be decoded is skipped.
     virtual void Feed(std::span<const std::uint8_t> frame, std::int64_t number) = 0;
-    // The number of the next picture in the order of showing; nothing when more frames are needed first.
+    // The number of the next picture in presentation order; nothing when more frames must be fed first.
     virtual std::optional<std::int64_t> Take() = 0;
-    // Stores the taken picture as JPEG and returns its size. Throws SourceError when it does not fit.
+    // Encodes the picture last taken into the buffer and returns its size. Throws SourceError when it does not fit.
     virtual std::size_t Encode(std::span<std::uint8_t> jpeg) = 0;
 };
 
@@ -40,12 +41,12 @@ class DecoderLibrary {
   public:
     virtual ~DecoderLibrary() = default;
 
-    // Codecs are spelled as CodecName does.
+    // codec: a name as base::CodecName gives it.
 
-    // As JpegOfKeyFrame of still.h.
+    // As JpegOfKeyFrame in still.h.
     virtual std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const = 0;
-    // With more threads than one, pictures come so many frames later as there are others: not for a row that grows at its
-    // end. Throws SourceError for a codec that cannot be decoded.
+    // Each thread beyond the first delays pictures by one more frame, so use one thread at the end of a growing
+    // recording. Throws SourceError for a codec that cannot be decoded.
     virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const = 0;
 };
 
@@ -53,7 +54,7 @@ class RemuxLibrary {
   public:
     virtual ~RemuxLibrary() = default;
 
-    // As Export of remux.h.
+    // As Export in remux.h.
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
 };
 

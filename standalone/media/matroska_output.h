@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A Matroska file or stream being written to a descriptor.
+// Writes a Matroska file or stream to a descriptor.
 #pragma once
 
 #include <memory>
@@ -11,25 +11,25 @@
 
 namespace lookhaven::media {
 
-// Order of calls: AddStream…, Begin, Write and Flush…, End. Times are in milliseconds. Each call throws
-// std::system_error with the descriptor's errno when it cannot be written to, SourceError when the muxer refuses what it
-// is given.
+// Call AddStream for each stream, then Begin, then Write and Flush any number of times, then End. Times are in
+// milliseconds. Every call throws std::system_error with the descriptor's errno when writing fails, SourceError when
+// the muxer refuses its input.
 class MatroskaOutput {
   public:
-    // Borrows the descriptor. Without seeking, sizes stay open and there is no seek table.
+    // Borrows the descriptor. If it is not seekable, sizes stay unknown and there is no seek table.
     MatroskaOutput(int descriptor, bool seekable);
     MatroskaOutput(const MatroskaOutput&) = delete;
     MatroskaOutput& operator=(const MatroskaOutput&) = delete;
 
-    // A stream's number and its parameters, to be filled in before Begin.
+    // Returns the stream's number, for Write.
     int AddStream(const StreamFormat& format);
     int AddStream(const AVCodecParameters& parameters);
     void SetStart(std::int64_t wall_ms);
 
     void Begin();
-    // Times of one stream may go back by up to two seconds, as those of reordered frames do.
+    // Frames in decoding order, with their presentation times, which may go back by up to two seconds.
     void Write(int stream, std::span<const std::uint8_t> data, std::int64_t time_ms, bool key_frame);
-    // Ends the cluster and hands everything on.
+    // Ends the cluster and writes out everything so far.
     void Flush();
     void End();
 

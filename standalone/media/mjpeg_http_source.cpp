@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A camera that answers an HTTP request with Motion JPEG as an endless multipart body.
+// A camera that responds to an HTTP request with Motion JPEG as an endless multipart body.
 #include "standalone/base/clock.h"
 #include "standalone/media/jpeg.h"
 #include "standalone/media/libav.h"
@@ -22,7 +22,8 @@ class MjpegHttpSource : public Source {
     MjpegHttpSource(const std::string& url, const SourceOptions& options, std::stop_token stop)
         : deadline_(std::move(stop), options.no_data_limit),
           connection_(Connect(url, options.credentials)),
-          reader_(Boundary(), kMaxFrameBytes, [this](std::span<std::uint8_t> buffer) { return Receive(buffer); }) {}
+          reader_(Boundary(), base::kMaxFrameBytes,
+                  [this](std::span<std::uint8_t> buffer) { return Receive(buffer); }) {}
 
     const std::optional<StreamFormat>& Audio() const override { return audio_; }
 

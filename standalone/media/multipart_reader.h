@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Takes an endless multipart answer apart into its bodies.
+// Splits an endless multipart response into its parts.
 //
-// Why so        Cameras differ in how they write the boundary and in whether they say a part's length; and a part must
-//               not take memory without bound, whatever the camera claims or sends.
+// Why so        Cameras differ in how they write the boundary and in whether they give a part's length; and no part may
+//               use unbounded memory, whatever the camera claims or sends.
 #pragma once
 
 #include <cstddef>
@@ -16,18 +16,19 @@
 
 namespace lookhaven::media {
 
-// The boundary named by a Content-Type such as "multipart/x-mixed-replace; boundary=frame", empty when it is none.
+// The boundary in a Content-Type such as "multipart/x-mixed-replace; boundary=frame"; empty for one that is not
+// multipart.
 std::string BoundaryOf(std::string_view content_type);
 
 class MultipartReader {
   public:
-    // Fills the beginning of the buffer with at least one byte and returns how many; throws at the end.
+    // Fills the beginning of the buffer and returns the number of bytes, at least one; throws at the end of the input.
     using Input = std::function<std::size_t(std::span<std::uint8_t>)>;
 
     MultipartReader(std::string boundary, std::size_t max_part_bytes, Input input);
 
-    // The next part's body, byte by byte as it was sent, valid until the next call. Larger parts are read past. Throws
-    // SourceError when what comes is no multipart answer or it is over, and whatever the input throws.
+    // The next part's body, exactly as it was sent, valid until the next call. Parts above the limit are skipped.
+    // Throws SourceError when the input is no multipart response or has ended, and whatever the input throws.
     std::span<const std::uint8_t> Next();
 
   private:

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Brings the time of a source onto the machine's monotonic clock.
+// Maps the times of a source to the machine's monotonic clock, and waits for them.
 #pragma once
 
 #include <cstdint>
@@ -9,11 +9,12 @@
 
 namespace lookhaven::media {
 
-// Waits until base::MonotonicMicros reaches the time; false when stop was requested first.
+// Waits until base::MonotonicMicros reaches due_us; false when stop was requested first.
 bool SleepUntil(std::int64_t due_us, const std::stop_token& stop);
 
-// Maps a source's own time to ours: the first frame is captured when it arrives, the others as far apart as the source
-// says. A source whose clock jumps or runs off by more than a second starts anew from the arrival.
+// Maps a source's own time to ours: the first frame counts as captured when it arrives, the others keep the source's
+// distances. When the result is more than a second from the arrival, because the source's clock jumped or drifted, the
+// mapping starts again from that arrival.
 class Timeline {
   public:
     std::int64_t Map(std::int64_t source_us, std::int64_t arrival_us);

@@ -1,26 +1,22 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a source hands on: one frame or audio block at a time, with the format it is in.
+// What a source delivers: one video frame or audio block at a time, with its format.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <span>
 #include <vector>
 
+#include "standalone/base/video.h"
+
 namespace lookhaven::media {
 
-enum class Medium { kVideo, kAudio };
+using base::Codec;
+using base::Medium;
 
-enum class Codec { kMjpeg, kH264, kH265, kAac, kPcmMulaw, kPcmAlaw, kOpus };
-
-// "MJPEG", "H264", "H265", "AAC", "PCMU", "PCMA", "OPUS"; a literal.
-const char* CodecName(Codec codec);
-
-// No camera sends larger frames in earnest; a source leaves out what is larger.
-constexpr std::size_t kMaxFrameBytes = 4'194'303;
-
-// How a medium is coded. Video has a size, audio a rate and channels; the other fields are 0.
+// How video or audio is coded. Video has a size, audio a rate and channels; the other fields are 0.
 struct StreamFormat {
     Codec codec = Codec::kMjpeg;
     int width = 0;
@@ -33,12 +29,21 @@ struct StreamFormat {
     bool operator==(const StreamFormat&) const = default;
 };
 
-// One frame. H.264 and H.265 come as Annex B, every key frame behind its parameter sets; AAC comes raw; MJPEG is the
-// camera's own JPEG, byte by byte.
+// The formats of what one source sends, or one recording holds.
+struct MediaFormat {
+    StreamFormat video;
+    std::optional<StreamFormat> audio;  // nothing when it is silent
+
+    bool operator==(const MediaFormat&) const = default;
+};
+
+// One frame. H.264 and H.265 are Annex B, with parameter sets in front of every key frame; AAC is raw, without ADTS
+// headers; MJPEG is exactly the camera's JPEG.
 struct Packet {
     Medium medium = Medium::kVideo;
     std::span<const std::uint8_t> data;  // valid until the source is asked for the next packet
-    std::int64_t timestamp_us = 0;       // base::MonotonicMicros at capture, as near as known; one clock for both media
+    std::int64_t timestamp_us =
+        0;  // base::MonotonicMicros at capture, as closely as known; the same clock for both media
     bool key_frame = false;
     const StreamFormat* format = nullptr;  // never null; lives as long as the data
 };

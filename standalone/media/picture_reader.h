@@ -2,10 +2,10 @@
 //
 // Reads any frame of a recording as a JPEG picture.
 //
-// Why so        Motion JPEG is one read from the file, without libav. Other codecs are decoded from the key frame before;
-//               the decoder's state is kept, so frames in a row are decoded once, and a jump forward decodes on from here
-//               or from a later key frame, whichever is nearer. A second thread decodes ahead, unless that is waiting for
-//               frames of a recording that grows.
+// Why so        A Motion JPEG frame is one read from the file, without libav. Other codecs are decoded from the key
+//               frame before. The decoder keeps its state, so consecutive frames are decoded once, and a jump forward
+//               continues from here or from a later key frame, whichever is nearer. A second thread decodes ahead,
+//               except at the end of a growing recording.
 #pragma once
 
 #include <cstddef>
@@ -15,7 +15,7 @@
 #include <string>
 #include <vector>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/media/libav_libraries.h"
 
 namespace lookhaven::media {
@@ -23,21 +23,21 @@ namespace lookhaven::media {
 class PictureReader {
   public:
     // The recording must outlive the reader; it may be refreshed between calls.
-    explicit PictureReader(const archive::Recording& recording) : recording_(recording) {}
+    explicit PictureReader(const archive::RecordingReader& recording) : recording_(recording) {}
 
-    // Stores the picture of a valid index and returns its size. Throws SourceError when it cannot be decoded or does not
-    // fit, archive::ArchiveError, std::system_error.
+    // Stores the picture of a valid index in the buffer and returns its size. Throws SourceError when it cannot be
+    // decoded or does not fit, archive::ArchiveError, std::system_error.
     std::size_t Read(int index, std::span<std::uint8_t> buffer);
 
   private:
     void Seek(std::uint32_t segment, std::uint32_t entry);
     void Decode(std::uint32_t entry);
 
-    const archive::Recording& recording_;
+    const archive::RecordingReader& recording_;
     std::unique_ptr<FrameDecoder> decoder_;
     std::string codec_;  // the decoder's
     std::vector<std::uint8_t> bytes_;
-    bool is_inside_ = false;  // the decoder is inside a row of frames of the segment
+    bool is_inside_ = false;  // the decoder continues at next_ of segment_
     std::uint32_t segment_ = 0;
     std::uint32_t next_ = 0;   // the entry to feed next
     std::int64_t shown_ = -1;  // the entry whose picture was taken last; -1 for none

@@ -17,7 +17,8 @@ struct ProbeResult {
     std::optional<StreamFormat> audio;
 };
 
-// Opens the source and watches a few frames. Throws SourceError when no picture comes within the limit.
+// Opens the source and reads up to a second and a half of it. Throws SourceError when it cannot be opened or no picture
+// comes within the limit.
 ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const Credentials& credentials,
                         std::chrono::milliseconds limit);
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Copies a recording or a span into one Matroska file, without coding anything anew.
+// Copies a recording or a span into one Matroska file without re-encoding.
 #pragma once
 
 #include <cstdint>
@@ -11,15 +11,16 @@ namespace lookhaven::media {
 
 struct ExportOptions {
     bool with_sound = true;
-    // Wall clock milliseconds; nothing: from the start, to the end. The copy begins at the key frame at or before.
+    // Wall clock, in milliseconds; nothing: from the start, to the end. The copy begins at the last key frame at or
+    // before begin_ms.
     std::optional<std::int64_t> begin_ms;
     std::optional<std::int64_t> end_ms;
 };
 
-// Copies the recording (.mkv or .span) to the descriptor, which need not be seekable: the copy starts at once and holds
-// no more than a second of footage in memory. A descriptor of a regular file makes a file with a seek table. Of a
-// recording that grows it copies what is there. Throws SourceError, archive::ArchiveError, std::system_error (EPIPE when
-// the receiver has left).
+// Copies the recording (.mkv or .span) to the descriptor, which need not be seekable: the copy starts at once and keeps
+// at most a second of footage in memory. Into a regular file it also writes a seek table. Of a growing recording it
+// copies what is there, and does not wait for more. Throws SourceError, archive::ArchiveError, std::system_error (EPIPE
+// when the receiver has disconnected).
 void Export(const std::filesystem::path& recording, int output, const ExportOptions& options);
 
 }  // namespace lookhaven::media

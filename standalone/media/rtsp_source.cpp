@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A camera that speaks RTSP, its media inside the TCP connection.
+// A camera that speaks RTSP, with its media inside the TCP connection.
 #include "standalone/base/clock.h"
 #include "standalone/media/demuxer.h"
 #include "standalone/media/pace.h"

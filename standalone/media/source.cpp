@@ -3,14 +3,9 @@
 
 #include "standalone/base/blocked_signals.h"
 #include "standalone/media/libav.h"
-#include "standalone/media/source_kinds.h"
 #include "standalone/media/source_url.h"
 
 namespace lookhaven::media {
-
-SourceKinds CameraKinds() {
-    return {{"rtsp", OpenRtsp}, {"http", OpenMjpegHttp}, {"https", OpenMjpegHttp}, {"file", OpenFileLoop}};
-}
 
 std::unique_ptr<Source> OpenSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options,
                                    std::stop_token stop) {

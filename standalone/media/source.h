@@ -3,8 +3,8 @@
 // Streams of frames from cameras and files, opened by URL.
 //
 //   rtsp://host/path        RTSP with its media inside the TCP connection
-//   http://… https://…      Motion JPEG as a multipart answer
-//   file:/path              a recording, played over and over at its own pace
+//   http://… https://…      Motion JPEG as a multipart response
+//   file:/path              a video file, played in a loop at its own pace
 //
 // Thread safety: one thread per source; any number of sources.
 #pragma once
@@ -27,7 +27,7 @@ class SourceError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// What the camera wants to know; empty when it asks nobody. Kept apart from the URL so that no log can show it.
+// The login of the camera; empty when it needs none. Kept out of the URL so that no log can show it.
 struct Credentials {
     std::string user;
     std::string password;
@@ -37,7 +37,7 @@ struct Credentials {
 
 struct SourceOptions {
     Credentials credentials;
-    // A source that has no picture for so long fails, even while other data still flows.
+    // A source that delivers no picture for this long fails, even while sound still flows.
     std::chrono::milliseconds no_data_limit{10'000};
 };
 
@@ -48,26 +48,26 @@ class Source {
     Source& operator=(const Source&) = delete;
     virtual ~Source() = default;
 
-    // The sound's format, or nothing when the source is silent. Does not change.
+    // The audio format, or nothing when the source is silent. Does not change.
     virtual const std::optional<StreamFormat>& Audio() const = 0;
 
-    // Waits for the next packet. Throws SourceError when the source ends, stalls, breaks or is told to stop; then the
-    // source is of no further use.
+    // Waits for the next packet. Throws SourceError when the source ends, stalls or fails, or on a stop request; then
+    // only destroy it.
     virtual Packet Next() = 0;
 };
 
-// Opens one kind of source by its whole URL, under the conditions of OpenSource.
+// Opens one kind of source by its whole URL; the contract is that of OpenSource.
 using SourceOpener = std::unique_ptr<Source> (*)(const std::string& url, const SourceOptions& options,
                                                  std::stop_token stop);
 
-// The kinds of source that a program knows, by the scheme of their URLs.
+// The kinds of source that a program knows, by URL scheme in lower case.
 using SourceKinds = std::map<std::string, SourceOpener>;
 
-// rtsp, http, https and file. A program may add its own.
+// The table in source_kinds.cpp: rtsp, http, https and file. A program may add others.
 SourceKinds CameraKinds();
 
 // Connects and reads as much as is needed to know the codecs. A stop request ends this and any later wait within about
-// 0.1 s; only the look-up of a host name cannot be cut short. Throws SourceError.
+// 0.1 s, except that resolving a host name cannot be interrupted. Throws SourceError.
 std::unique_ptr<Source> OpenSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options,
                                    std::stop_token stop);
 

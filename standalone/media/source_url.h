@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Source URLs: their parts, credentials put in for libav and taken out for people.
+// Parts of source URLs; adds credentials for libav and removes them for logs.
 #pragma once
 
 #include <string>
@@ -10,11 +10,11 @@
 
 namespace lookhaven::media {
 
-// The lower-case letters before the first colon; empty when there is none.
+// What stands before the first colon, in lower case; empty when there is no colon.
 std::string UrlScheme(std::string_view url);
 
 // The URL with user and password in front of its host, percent-encoded; unchanged without credentials. Throws
-// SourceError when they are longer than libav's buffer, which would cut them silently.
+// SourceError when they exceed libav's buffer, which would truncate them silently.
 std::string WithCredentials(const std::string& url, const Credentials& credentials);
 
 // The text with the user information and the query of every URL in it replaced by "…".

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Makes a JPEG picture of a key frame.
+// Converts a key frame to a JPEG picture.
 #pragma once
 
 #include <cstdint>
@@ -11,8 +11,8 @@
 
 namespace lookhaven::media {
 
-// The picture of a frame that needs no other; H.264 and H.265 as Annex B behind their parameter sets. Works in this
-// thread alone, and takes about 10 ms and 20 bytes a pixel. Throws SourceError when the frame cannot be decoded.
+// frame: a key frame; H.264 and H.265 as Annex B with parameter sets in front. Starts no thread; takes about 10 ms and
+// 20 bytes per pixel. Throws SourceError when the frame cannot be decoded.
 std::vector<std::uint8_t> JpegOfKeyFrame(Codec codec, std::span<const std::uint8_t> frame);
 
 }  // namespace lookhaven::media

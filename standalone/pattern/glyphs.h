@@ -23,7 +23,7 @@ class GlyphSet {
     explicit GlyphSet(int height_px);
 
     const Glyph& Of(char character) const;
-    // All characters are equally wide, so that a running clock stands still.
+    // Pixels from one character to the next; the same for all, so that a running clock does not jitter.
     int Advance() const { return advance_px_; }
     int Height() const { return height_px_; }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Draws the still part of the test pattern.
+// Draws the background of the test pattern.
 #pragma once
 
 #include <array>
@@ -11,7 +11,7 @@
 
 namespace lookhaven::pattern {
 
-// One plane of a picture; rows follow each other without a gap.
+// One plane of a picture, without gaps between rows.
 struct Plane {
     int width = 0;
     int height = 0;
@@ -26,10 +26,11 @@ using Picture = std::array<Plane, 3>;
 
 struct Landscape {
     Picture picture;
-    std::vector<int> ridge;  // by column: the row at which the hills begin
+    std::vector<int> ridge;  // by column: the first row of the hills
 };
 
-// Sky, stars, hills and colour bars. The seed chooses colours and shapes, the same ones every time. Sizes are even.
+// Sky, stars, hills and colour bars. The same seed always gives the same colours and shapes. Width and height must be
+// even.
 Landscape DrawLandscape(int width, int height, int unit_px, std::string_view seed);
 
 }  // namespace lookhaven::pattern

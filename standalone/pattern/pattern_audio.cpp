@@ -17,14 +17,14 @@ namespace {
 
 constexpr int kSampleRateHz = 48000;
 constexpr int kBlockSamples = 1024;
-constexpr int kRoundBlocks = 94;  // about two seconds
-constexpr int kStrokes = 2;       // a round
+constexpr int kPeriodBlocks = 94;  // about two seconds
+constexpr int kStrokes = 2;        // per period
 
 // Two tones that fade, the second stroke lower than the first.
 float Sample(int position) {
-    constexpr int kRoundSamples = kRoundBlocks * kBlockSamples;
-    const int stroke = position % kRoundSamples * kStrokes / kRoundSamples;
-    const double seconds = static_cast<double>(position % (kRoundSamples / kStrokes)) / kSampleRateHz;
+    constexpr int kPeriodSamples = kPeriodBlocks * kBlockSamples;
+    const int stroke = position % kPeriodSamples * kStrokes / kPeriodSamples;
+    const double seconds = static_cast<double>(position % (kPeriodSamples / kStrokes)) / kSampleRateHz;
     const double pitch_hz = stroke == 0 ? 660 : 550;
     const double envelope = 0.05 * std::exp(-9 * seconds) * std::min(1.0, seconds * 200);
     const double angle = 2 * std::numbers::pi * pitch_hz * seconds;
@@ -50,12 +50,12 @@ media::AvPtr<AVCodecContext> OpenEncoder() {
 
 Chime::Chime() {
     const media::AvPtr<AVCodecContext> encoder = OpenEncoder();
-    format_ = {media::Codec::kAac, 0, 0,
-               kSampleRateHz,      1, {encoder->extradata, encoder->extradata + encoder->extradata_size}};
+    format_ = {base::Codec::kAac, 0, 0,
+               kSampleRateHz,     1, {encoder->extradata, encoder->extradata + encoder->extradata_size}};
     const media::AvPtr<AVPacket> packet = media::OwnAv(av_packet_alloc());
-    // Each block depends on its neighbours: of three rounds the second is the one that can follow itself.
+    // Each block depends on its neighbours: only the second of several periods can follow itself.
     std::vector<std::vector<std::uint8_t>> encoded;
-    for (int block = 0; encoded.size() < 2 * kRoundBlocks; ++block) {
+    for (int block = 0; encoded.size() < 2 * kPeriodBlocks; ++block) {
         media::AvPtr<AVFrame> frame = media::OwnAv(av_frame_alloc());
         frame->format = encoder->sample_fmt;
         frame->nb_samples = kBlockSamples;
@@ -73,12 +73,12 @@ Chime::Chime() {
             av_packet_unref(packet.get());
         }
     }
-    blocks_.assign(std::make_move_iterator(encoded.begin() + kRoundBlocks),
-                   std::make_move_iterator(encoded.begin() + 2 * kRoundBlocks));
+    blocks_.assign(std::make_move_iterator(encoded.begin() + kPeriodBlocks),
+                   std::make_move_iterator(encoded.begin() + 2 * kPeriodBlocks));
 }
 
 std::span<const std::uint8_t> Chime::Block(std::int64_t number) const {
-    return blocks_[static_cast<std::size_t>(number % kRoundBlocks)];
+    return blocks_[static_cast<std::size_t>(number % kPeriodBlocks)];
 }
 
 std::int64_t Chime::BlockTime(std::int64_t number) const {

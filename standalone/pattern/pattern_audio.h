@@ -2,8 +2,8 @@
 //
 // The test pattern's sound: a quiet chime about once a second, as AAC.
 //
-// Why so        The chime repeats after a whole number of AAC blocks, so one round is encoded at the start and played
-//               for ever: sound then costs no time at all.
+// Why so        The chime repeats after a whole number of AAC blocks, so one period is encoded at the start and played
+//               in a loop: afterwards sound takes no processor time.
 #pragma once
 
 #include <cstdint>
@@ -16,12 +16,12 @@ namespace lookhaven::pattern {
 
 class Chime {
   public:
-    // Encodes one round. Throws media::SourceError.
+    // Encodes one period. Throws media::SourceError.
     Chime();
 
     const media::StreamFormat& Format() const { return format_; }
 
-    // The block of that number, from 0 on without an end, and its time since the first, in microseconds.
+    // Any number from 0 on; BlockTime is in microseconds since block 0.
     std::span<const std::uint8_t> Block(std::int64_t number) const;
     std::int64_t BlockTime(std::int64_t number) const;
 

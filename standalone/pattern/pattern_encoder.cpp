@@ -21,7 +21,7 @@ class MjpegEncoder : public PatternEncoder {
   public:
     explicit MjpegEncoder(const PatternSettings& settings)
         : quality_(settings.quality),
-          format_{media::Codec::kMjpeg, settings.width, settings.height, 0, 0, {}},
+          format_{base::Codec::kMjpeg, settings.width, settings.height, 0, 0, {}},
           compressor_(tjInitCompress(), tjDestroy),
           buffer_(tjBufSize(settings.width, settings.height, TJSAMP_420)) {}
 
@@ -71,7 +71,7 @@ class H264Encoder : public PatternEncoder {
             media::CheckAv(av_opt_set(encoder_->priv_data, key, value, 0), "cannot set up libx264");
         }
         media::CheckAv(avcodec_open2(encoder_.get(), codec, nullptr), "cannot set up libx264");
-        format_ = {media::Codec::kH264, settings.width, settings.height, 0, 0, {}};
+        format_ = {base::Codec::kH264, settings.width, settings.height, 0, 0, {}};
     }
 
     const media::StreamFormat& Format() const override { return format_; }
@@ -85,7 +85,7 @@ class H264Encoder : public PatternEncoder {
         const std::span<const std::uint8_t> data{packet_->data, static_cast<std::size_t>(packet_->size)};
         const bool key_frame = (packet_->flags & AV_PKT_FLAG_KEY) != 0;
         if (key_frame && format_.extra_data.empty()) {
-            format_.extra_data = media::ParameterSets(media::Codec::kH264, data).Current();
+            format_.extra_data = media::ParameterSets(base::Codec::kH264, data).Current();
         }
         return {data, key_frame};
     }

@@ -30,11 +30,11 @@ class PatternEncoder {
   public:
     virtual ~PatternEncoder() = default;
     virtual const media::StreamFormat& Format() const = 0;
-    // Pictures of the settings' size; their numbers grow by one. Throws media::SourceError.
+    // The picture must have the settings' size, and numbers must grow by one. Throws media::SourceError.
     virtual EncodedPicture Encode(const Picture& picture, std::int64_t number) = 0;
 };
 
-// The codec is "mjpeg" or "h264"; throws media::SourceError for another.
+// codec: "mjpeg" or "h264". Throws media::SourceError for another, and when its encoder is missing.
 std::unique_ptr<PatternEncoder> MakePatternEncoder(const std::string& codec, const PatternSettings& settings);
 
 }  // namespace lookhaven::pattern

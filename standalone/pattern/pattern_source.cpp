@@ -52,7 +52,7 @@ PatternUrl ParsePatternUrl(std::string_view text) {
     return url;
 }
 
-int Number(const PatternUrl& url, const char* key, int fallback, int least, int most) {
+int Number(const PatternUrl& url, const char* key, int fallback, int min, int max) {
     const auto found = url.parameters.find(key);
     if (found == url.parameters.end()) {
         return fallback;
@@ -60,9 +60,9 @@ int Number(const PatternUrl& url, const char* key, int fallback, int least, int 
     const std::string& text = found->second;
     int value = 0;
     const auto end = text.data() + text.size();
-    if (std::from_chars(text.data(), end, value).ptr != end || value < least || value > most) {
-        throw media::SourceError(std::string("has a ") + key + " that is not from " + std::to_string(least) + " to " +
-                                 std::to_string(most));
+    if (std::from_chars(text.data(), end, value).ptr != end || value < min || value > max) {
+        throw media::SourceError(std::string("has a ") + key + " that is not from " + std::to_string(min) + " to " +
+                                 std::to_string(max));
     }
     return value;
 }
@@ -116,7 +116,7 @@ class PatternSource : public media::Source {
         const Picture& picture = scene_.Draw(frame_number_, base::WallMillis());
         const EncodedPicture encoded = encoder_->Encode(picture, frame_number_);
         ++frame_number_;
-        return {media::Medium::kVideo, encoded.data, picture_us, encoded.key_frame, &encoder_->Format()};
+        return {base::Medium::kVideo, encoded.data, picture_us, encoded.key_frame, &encoder_->Format()};
     }
 
   private:
@@ -128,10 +128,11 @@ class PatternSource : public media::Source {
     media::Packet NextBlock() {
         const std::int64_t block_us = start_us_ + chime_->BlockTime(block_number_);
         Wait(block_us);
-        return {media::Medium::kAudio, chime_->Block(block_number_++), block_us, true, &*audio_};
+        return {base::Medium::kAudio, chime_->Block(block_number_++), block_us, true, &*audio_};
     }
 
-    // A machine that slept or was too busy goes on from now: nobody wants the missed frames. Both media move together.
+    // After the machine slept or was too busy, continue from now: nobody needs the missed frames. Both media shift
+    // together.
     void Wait(std::int64_t due_us) {
         if (!media::SleepUntil(due_us, stop_)) {
             throw media::SourceError("stopped");

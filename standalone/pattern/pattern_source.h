@@ -12,11 +12,11 @@
 
 namespace lookhaven::pattern {
 
-// A media::SourceOpener; asks nobody, so it takes no credentials and never stalls.
+// A media::SourceOpener. Ignores the options: it needs no credentials and never stalls.
 std::unique_ptr<media::Source> OpenPattern(const std::string& url, const media::SourceOptions& options,
                                            std::stop_token stop);
 
-// The kinds of cameras, and the test pattern.
+// media::CameraKinds and the test pattern ("test").
 media::SourceKinds AllSourceKinds();
 
 }  // namespace lookhaven::pattern

@@ -59,12 +59,12 @@ Scene::Scene(int width, int height, const std::string& label)
       moon_size_px_(std::min({26 * unit_px_, width, height}) & ~1) {
     moon_ = DrawMoonSprite(moon_size_px_, 3.4 * unit_px_);
     Landscape landscape = DrawLandscape(width, height, unit_px_, label);
-    still_ = std::move(landscape.picture);
+    background_ = std::move(landscape.picture);
     ridge_ = std::move(landscape.ridge);
-    DrawText(still_, large_, 4 * unit_px_, height_ - 13 * unit_px_, label);
-    DrawText(still_, small_, 4 * unit_px_, height_ - 7 * unit_px_,
+    DrawText(background_, large_, 4 * unit_px_, height_ - 13 * unit_px_, label);
+    DrawText(background_, small_, 4 * unit_px_, height_ - 7 * unit_px_,
              std::to_string(width) + "x" + std::to_string(height) + " test pattern");
-    picture_ = still_;
+    picture_ = background_;
 }
 
 const Picture& Scene::Draw(std::int64_t frame_number, std::int64_t wall_millis) {
@@ -94,7 +94,8 @@ void Scene::Restore(const Area& area) {
         const int top = std::max(0, area.y / shrink - 1);
         const int bottom = std::min(picture_[p].height, (area.y + area.height) / shrink + 1);
         for (int row = top; row < bottom && right > left; ++row) {
-            std::memcpy(picture_[p].Row(row) + left, still_[p].Row(row) + left, static_cast<std::size_t>(right - left));
+            std::memcpy(picture_[p].Row(row) + left, background_[p].Row(row) + left,
+                        static_cast<std::size_t>(right - left));
         }
     }
 }
@@ -125,7 +126,7 @@ void Scene::DrawMoon(std::int64_t wall_millis) {
     drawn_.push_back({x0, y0, moon_size_px_, moon_size_px_});
 }
 
-// A light that runs along the colour bars without a jerk, so that a stutter shows.
+// A light that moves steadily along the colour bars, so that stutter is visible.
 void Scene::DrawMarker(std::int64_t wall_millis) {
     const int marker_px = 4 * unit_px_;
     const auto step = static_cast<int>((wall_millis % kMarkerPeriodMs) * (width_ - marker_px) / kMarkerPeriodMs);

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Draws the test pattern: a landscape at dusk under a slowly moving moon, with a running clock, a frame number, a label
-// and colour bars.
+// Draws the test pattern: a landscape at dusk with a slowly moving moon, a running clock, a frame number, a label and
+// colour bars.
 //
-// Why so        The pattern runs on small machines beside everything else, so the still part is drawn once, and each
-//               frame repairs and draws only the places that change.
+// Why so        The pattern must be cheap on small machines. So the background is drawn once, and each frame restores
+//               the areas that the last frame drew on and draws only what moves.
 #pragma once
 
 #include <cstdint>
@@ -19,10 +19,10 @@ namespace lookhaven::pattern {
 
 class Scene {
   public:
-    // Sizes are even. The label chooses the colours too.
+    // Width and height must be even. The label also determines the colours.
     Scene(int width, int height, const std::string& label);
 
-    // Draws the frame of that number and time, which the clock shows as local time. The picture is valid until the next call.
+    // The clock shows wall_millis as local time. The picture is valid until the next call.
     const Picture& Draw(std::int64_t frame_number, std::int64_t wall_millis);
 
   private:
@@ -41,12 +41,12 @@ class Scene {
     int unit_px_;  // of the layout: 1/90 of the height
     GlyphSet large_;
     GlyphSet small_;
-    std::vector<int> ridge_;  // by column: the row at which the hills begin
+    std::vector<int> ridge_;  // by column: the first row of the hills
     std::vector<std::uint8_t> moon_;
     int moon_size_px_;
-    Picture still_;
+    Picture background_;
     Picture picture_;
-    std::vector<Area> drawn_;
+    std::vector<Area> drawn_;  // areas that differ from the background
 };
 
 }  // namespace lookhaven::pattern

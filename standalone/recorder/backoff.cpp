@@ -11,13 +11,13 @@ void Backoff::NotePicture(std::int64_t now_us) {
     last_picture_us_ = now_us;
 }
 
-std::chrono::milliseconds Backoff::AfterFailure() {
+std::chrono::milliseconds Backoff::DelayAfterFailure() {
     if (first_picture_us_ && std::chrono::microseconds(last_picture_us_ - *first_picture_us_) >= kStable) {
-        step_ = kFirst;
+        delay_ = kMinDelay;
     }
     first_picture_us_.reset();
-    const auto longest = std::exchange(step_, std::min(step_ * 2, kLast)).count();
-    return std::chrono::milliseconds(std::uniform_int_distribution(longest / 2, longest)(random_));
+    const auto delay = std::exchange(delay_, std::min(delay_ * 2, kMaxDelay)).count();
+    return std::chrono::milliseconds(std::uniform_int_distribution(delay / 2, delay)(random_));
 }
 
 }  // namespace lookhaven::recorder

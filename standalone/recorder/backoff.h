@@ -10,26 +10,26 @@
 
 namespace lookhaven::recorder {
 
-// Each failure in a row doubles the wait, from kFirst to kLast, less up to a half by chance so that the cameras of one
-// broken switch do not come back in step. A stream whose
-// pictures flowed for kStable begins anew; silence after the last of them does not count.
+// The delay doubles with each consecutive failure, from kMinDelay up to kMaxDelay, and a random part of up to half of
+// it is taken off, so that the cameras behind one failed switch do not all reconnect at once. It starts over at
+// kMinDelay after pictures arrived for kStable or longer, measured from the first picture to the last.
 class Backoff {
   public:
-    static constexpr std::chrono::milliseconds kFirst{1'000};
-    static constexpr std::chrono::milliseconds kLast{30'000};
+    static constexpr std::chrono::milliseconds kMinDelay{1'000};
+    static constexpr std::chrono::milliseconds kMaxDelay{30'000};
     static constexpr std::chrono::milliseconds kStable{10'000};
 
     explicit Backoff(std::uint32_t seed) : random_(seed) {}
 
-    // A picture came at that time of base::MonotonicMicros.
+    // A picture arrived; now_us is base::MonotonicMicros.
     void NotePicture(std::int64_t now_us);
 
-    // The wait after a failure.
-    std::chrono::milliseconds AfterFailure();
+    // How long to wait after this failure. Not the upper bound: the random part is already off.
+    std::chrono::milliseconds DelayAfterFailure();
 
   private:
     std::minstd_rand random_;
-    std::chrono::milliseconds step_ = kFirst;
+    std::chrono::milliseconds delay_ = kMinDelay;
     std::optional<std::int64_t> first_picture_us_;  // since the last failure
     std::int64_t last_picture_us_ = 0;
 };

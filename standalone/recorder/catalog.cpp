@@ -10,7 +10,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// A camera without a plan of its own keeps no footage from before a mark, since its stream would have to run always.
+// A camera without a plan of its own has no pre-record: its stream would have to run all the time.
 CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::RecordingPlan>& plans,
                   store::Mounts& mounts) {
     const auto found = plans.find(camera.id);

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What could run: the streams of enabled cameras, how they are recorded, and where to, as the store has it.
+// The enabled cameras as the store describes them: their streams, how each is recorded, and to which mount.
 //
-// Why so        A live stream must outlast the store: while that is away, the catalog keeps what it read last. And a
-//               store that hangs must hold up nobody, so a thread of its own reads it.
+// Why so        Live streams continue while the store is unavailable, so the catalog keeps what it read last. A store
+//               that hangs must block nobody, so a thread of its own reads it.
 // Thread safety Any thread.
 #pragma once
 
@@ -42,17 +42,17 @@ struct CatalogContents {
 
 class Catalog {
   public:
-    // Starts the thread, which begins to read at once and calls on_change after it found something new. Throws
-    // std::system_error when there is no thread to be had.
+    // Starts the thread, which reads at once and calls on_change, from that thread, whenever it found something new.
+    // Throws std::system_error when no thread can be started.
     Catalog(const std::string& store_url, std::function<void()> on_change);
 
-    // Asks for the store to be read anew where it says that something changed; does not wait.
+    // Has the store read again if its revision changed; does not wait.
     void Refresh() { thread_.Ask(); }
 
-    // What was read last, never null.
+    // What was read last; empty before the first read, never null.
     std::shared_ptr<const CatalogContents> Current() const;
 
-    // As StoreThread's.
+    // As in StoreThread.
     void RequestStop() { thread_.RequestStop(); }
     bool HasEnded() const { return thread_.HasEnded(); }
 

@@ -7,20 +7,20 @@
 namespace lookhaven::recorder {
 
 media::Packet Frame::Packet() const {
-    return {medium, data, timestamp_us, key_frame, medium == media::Medium::kVideo ? &format->video : &*format->audio};
+    return {medium, data, timestamp_us, key_frame, medium == base::Medium::kVideo ? &format->video : &*format->audio};
 }
 
 void FrameQueue::Push(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
     const std::lock_guard lock(mutex_);
     SetFormat(packet, audio);
-    const bool is_video = packet.medium == media::Medium::kVideo;
+    const bool is_video = packet.medium == base::Medium::kVideo;
     if (!format_ || (!is_video && !format_->audio)) {
         return;
     }
     const bool fits = queued_bytes_ + packet.data.size() <= capacity_bytes_;
-    losses_.now = losses_.now ? !(fits && is_video && packet.key_frame) : !fits;
-    if (losses_.now) {
-        losses_.frames += is_video ? 1 : 0;
+    drops_.is_dropping = drops_.is_dropping ? !(fits && is_video && packet.key_frame) : !fits;
+    if (drops_.is_dropping) {
+        drops_.frames += is_video ? 1 : 0;
         return;
     }
     frames_.push_back(
@@ -31,9 +31,9 @@ void FrameQueue::Push(const media::Packet& packet, const std::optional<media::St
 
 // The frames of one format share it.
 void FrameQueue::SetFormat(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
-    if (packet.medium == media::Medium::kVideo &&
+    if (packet.medium == base::Medium::kVideo &&
         (!format_ || format_->video != *packet.format || format_->audio != audio)) {
-        format_ = std::make_shared<const RunFormat>(RunFormat{*packet.format, audio});
+        format_ = std::make_shared<const media::MediaFormat>(media::MediaFormat{*packet.format, audio});
     }
 }
 
@@ -57,9 +57,9 @@ void FrameQueue::Wake() {
     changed_.notify_one();
 }
 
-FrameQueue::Losses FrameQueue::LostFrames() const {
+FrameQueue::Drops FrameQueue::Dropped() const {
     const std::lock_guard lock(mutex_);
-    return losses_;
+    return drops_;
 }
 
 }  // namespace lookhaven::recorder

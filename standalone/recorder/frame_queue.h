@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Hands frames from the thread that reads a camera to the thread that records it.
+// Passes frames from the thread that reads a camera to the thread that records it.
 //
-// Why so        A disk may be slower than the camera, or stand still; the live picture must not feel it. So the queue
-//               holds so many bytes and no more, and whoever puts a frame in never waits.
-// Invariants    (1) What comes out is what a decoder needs: after a frame that found no room, everything is left out up to
-//               the next key frame that does.
+// Why so        A disk may be slower than the camera, or hang; live view must not suffer. So the queue has a fixed
+//               capacity in bytes, and Push never waits for the disk.
+// Invariants    (1) What comes out can be decoded: after a frame that did not fit, everything is dropped up to the next
+//               key frame that fits.
 //               (2) The bytes queued never exceed the capacity.
 // Thread safety Any thread.
 #pragma once
@@ -22,18 +22,10 @@
 
 namespace lookhaven::recorder {
 
-// What the frames of a run have in common.
-struct RunFormat {
-    media::StreamFormat video;
-    std::optional<media::StreamFormat> audio;
-
-    bool operator==(const RunFormat&) const = default;
-};
-
 // A packet that owns its data.
 struct Frame {
-    std::shared_ptr<const RunFormat> format;
-    media::Medium medium = media::Medium::kVideo;
+    std::shared_ptr<const media::MediaFormat> format;
+    base::Medium medium = base::Medium::kVideo;
     std::vector<std::uint8_t> data;
     std::int64_t timestamp_us = 0;
     bool key_frame = false;
@@ -46,21 +38,21 @@ class FrameQueue {
   public:
     explicit FrameQueue(std::size_t capacity_bytes) : capacity_bytes_(capacity_bytes) {}
 
-    // Copies the packet into the queue, or leaves it out. audio is the format of the sound that goes with it. Never
-    // waits for the other side's work.
+    // Copies the packet into the queue, or drops it. audio: the format of the sound that goes with the picture. Never
+    // waits for the recording thread.
     void Push(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
 
-    // The oldest frame; nothing when none came until the time (base::MonotonicMicros) or Wake was called.
+    // The oldest frame. Waits for one until until_us (base::MonotonicMicros) or Wake; nothing when none came.
     std::optional<Frame> Pop(std::int64_t until_us);
-    // Ends a Pop that waits, or the next one that would.
+    // Ends the Pop that is waiting; when none is, the next one does not wait.
     void Wake();
 
-    // Frames left out so far, and whether that goes on.
-    struct Losses {
+    // Pictures dropped so far, and whether the queue is dropping now. Sound is not counted.
+    struct Drops {
         std::uint64_t frames = 0;
-        bool now = false;
+        bool is_dropping = false;
     };
-    Losses LostFrames() const;
+    Drops Dropped() const;
 
   private:
     void SetFormat(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
@@ -70,8 +62,8 @@ class FrameQueue {
     std::condition_variable changed_;
     std::deque<Frame> frames_;
     std::size_t queued_bytes_ = 0;
-    std::shared_ptr<const RunFormat> format_;  // null before the first picture
-    Losses losses_;
+    std::shared_ptr<const media::MediaFormat> format_;  // null before the first picture
+    Drops drops_;
     bool woken_ = false;
 };
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Lets one recorder run for each installation.
+// Makes sure that only one recorder runs for an installation.
 #pragma once
 
 #include "standalone/base/file_descriptor.h"

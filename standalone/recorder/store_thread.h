@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A thread with a connection to the store, for work that nobody may wait for.
+// A thread with a connection to the store, for work that must not block its callers.
 //
-// Why so        The store may be away or hang for as long as it likes; live streams and recordings go on meanwhile.
+// Why so        Live streams and recordings go on while the store is unavailable or hangs.
 // Thread safety Ask, RequestStop and HasEnded from any thread; the work runs in the thread alone.
 #pragma once
 
@@ -23,15 +23,15 @@ class StoreThread {
   public:
     using Work = std::function<void(store::Store& store, const std::stop_token& stop)>;
 
-    // Starts the thread, which takes no signals and does the work once. When the work or the opening of the store throws,
-    // "cannot <purpose>" is logged once for each reason, and the store is opened anew the next time. Throws
-    // std::system_error when there is no thread to be had.
+    // Starts the thread, which takes no signals and does the work once. When the work or the opening of the store
+    // throws, "cannot <purpose>" is logged once for each reason, and the store is opened again the next time. Throws
+    // std::system_error when no thread can be started.
     StoreThread(std::string store_url, std::string purpose, Work work);
 
-    // Does the work once more, or for the first time, soon; does not wait.
+    // Has the thread do the work soon; requests made before it starts count as one. Does not wait.
     void Ask();
 
-    // Does what was asked for to the end once more and leaves; does not wait for that.
+    // Lets the work that was asked for finish, then ends the thread; does not wait for that.
     void RequestStop() { thread_.request_stop(); }
     // Once true, destruction does not wait.
     bool HasEnded() const { return has_ended_; }
@@ -44,7 +44,7 @@ class StoreThread {
     const std::string purpose_;
     const Work work_;
 
-    // The thread's alone.
+    // Only the thread uses these.
     std::optional<store::Store> store_;
     std::string reported_failure_;
 

@@ -15,8 +15,8 @@ constexpr std::int64_t kAudioBitsPerSecond = 128'000;
 
 ring::StreamFormat RingFormat(const media::StreamFormat& format) {
     const bool is_video = format.width > 0;
-    return {media::CodecName(format.codec), format.extra_data, format.width, format.height,
-            !is_video || format.codec == media::Codec::kMjpeg};
+    return {base::CodecName(format.codec), format.extra_data, format.width, format.height,
+            !is_video || format.codec == base::Codec::kMjpeg};
 }
 
 // Goes by the picture's size more than by its contents, so that a restarted recorder comes to the same ring.
@@ -25,8 +25,8 @@ ring::StreamEstimate VideoEstimate(const media::StreamFormat& format, std::size_
     const auto usual_bytes = static_cast<std::uint64_t>(pixels) / 8;
     const auto frame_bytes =
         static_cast<std::int64_t>(std::bit_ceil(std::max<std::uint64_t>(usual_bytes, first_frame_bytes)));
-    const bool is_mjpeg = format.codec == media::Codec::kMjpeg;
-    return {ring::Medium::kVideo, is_mjpeg, is_mjpeg ? frame_bytes * 8 * kUsualFramesPerSecond : pixels * 4,
+    const bool is_mjpeg = format.codec == base::Codec::kMjpeg;
+    return {base::Medium::kVideo, is_mjpeg, is_mjpeg ? frame_bytes * 8 * kUsualFramesPerSecond : pixels * 4,
             frame_bytes, kUsualFramesPerSecond};
 }
 
@@ -39,7 +39,7 @@ std::int64_t CaptureMillis(std::int64_t timestamp_us) {
 
 void StreamRings::Write(const media::Packet& packet, const std::optional<media::StreamFormat>& audio) {
     const ring::Frame frame{packet.data, 0, packet.key_frame, packet.timestamp_us, CaptureMillis(packet.timestamp_us)};
-    if (packet.medium == media::Medium::kAudio) {
+    if (packet.medium == base::Medium::kAudio) {
         if (audio_) {
             audio_->writer.Write(frame);
         }
@@ -49,7 +49,7 @@ void StreamRings::Write(const media::Packet& packet, const std::optional<media::
         if (!video_format_) {
             OpenAudio(audio, packet.format->codec);
         }
-        Open(video_, ring::Medium::kVideo, RingFormat(*packet.format),
+        Open(video_, base::Medium::kVideo, RingFormat(*packet.format),
              VideoEstimate(*packet.format, packet.data.size()));
         video_format_ = *packet.format;
     }
@@ -73,18 +73,18 @@ void StreamRings::Beat() {
     }
 }
 
-void StreamRings::OpenAudio(const std::optional<media::StreamFormat>& audio, media::Codec video_codec) {
-    if (!audio && video_codec == media::Codec::kMjpeg) {
+void StreamRings::OpenAudio(const std::optional<media::StreamFormat>& audio, base::Codec video_codec) {
+    if (!audio && video_codec == base::Codec::kMjpeg) {
         audio_.reset();
         return;
     }
     ring::StreamFormat format = audio ? RingFormat(*audio) : ring::StreamFormat{};
     format.every_frame_is_key = true;
-    Open(audio_, ring::Medium::kAudio, format, {ring::Medium::kAudio, true, kAudioBitsPerSecond, 0, 0});
+    Open(audio_, base::Medium::kAudio, format, {base::Medium::kAudio, true, kAudioBitsPerSecond, 0, 0});
 }
 
 // A ring of another format is retired first: its size was that of other frames.
-void StreamRings::Open(std::optional<Ring>& ring, ring::Medium medium, const ring::StreamFormat& format,
+void StreamRings::Open(std::optional<Ring>& ring, base::Medium medium, const ring::StreamFormat& format,
                        const ring::StreamEstimate& estimate) {
     if (ring && ring->format == format) {
         return;

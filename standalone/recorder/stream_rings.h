@@ -2,8 +2,8 @@
 //
 // The rings of one live stream: pictures, and the sound that goes with them.
 //
-// Invariants    (1) The sound's ring exists before the first picture can be found, since viewers look for both. A
-//               stream of pictures other than MJPEG has one even when it is silent.
+// Invariants    (1) The audio ring exists before the first picture can be found, since viewers look for both. A stream
+//               in another codec than MJPEG has one even when it is silent.
 //               (2) Both rings begin and end their runs together.
 // Thread safety One thread.
 #pragma once
@@ -29,10 +29,10 @@ class StreamRings {
     // when the rings cannot be made.
     void Write(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
 
-    // The source failed: what it sent is old now, and no viewer finds it any more.
+    // The source failed: viewers find none of its frames any more, and wait for the next run.
     void EndRun();
 
-    // Says that the writer lives although no frame comes.
+    // Heartbeat: the writer is alive although no frame comes. Call once a second meanwhile.
     void Beat();
 
   private:
@@ -41,8 +41,8 @@ class StreamRings {
         ring::Writer writer;
     };
 
-    void OpenAudio(const std::optional<media::StreamFormat>& audio, media::Codec video_codec);
-    void Open(std::optional<Ring>& ring, ring::Medium medium, const ring::StreamFormat& format,
+    void OpenAudio(const std::optional<media::StreamFormat>& audio, base::Codec video_codec);
+    void Open(std::optional<Ring>& ring, base::Medium medium, const ring::StreamFormat& format,
               const ring::StreamEstimate& estimate);
 
     const base::Installation& installation_;

@@ -71,7 +71,7 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
                 recording_->Push(packet, source->Audio());
             }
         }
-        if (packet.medium == media::Medium::kVideo) {
+        if (packet.medium == base::Medium::kVideo) {
             backoff_.NotePicture(base::MonotonicMicros());
         }
         if (!std::exchange(live, true)) {
@@ -83,7 +83,7 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
 void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& stop) {
     constexpr std::int64_t kBeatUs = 1'000'000;
     const std::int64_t now_us = base::MonotonicMicros();
-    const std::chrono::microseconds wait = backoff_.AfterFailure();
+    const std::chrono::microseconds wait = backoff_.DelayAfterFailure();
     const std::int64_t end_us = now_us + wait.count();
     for (std::int64_t step_us = now_us; step_us < end_us;) {
         rings.Beat();
@@ -95,10 +95,10 @@ void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& sto
 }
 
 void StreamWorker::ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio) {
-    std::string text = Title(stream_, plan_) + "live, " + media::CodecName(video.codec) + ' ' +
+    std::string text = Title(stream_, plan_) + "live, " + base::CodecName(video.codec) + ' ' +
                        std::to_string(video.width) + 'x' + std::to_string(video.height);
     if (audio) {
-        text += std::string(" with ") + media::CodecName(audio->codec);
+        text += std::string(" with ") + base::CodecName(audio->codec);
     }
     base::LogInfo(text);
     reported_failure_.clear();

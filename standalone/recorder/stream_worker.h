@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Runs one live stream: reads its source and fills its rings, and tries again whenever the source fails.
+// Runs one live stream: reads its source, fills its rings, and reconnects whenever the source fails.
 #pragma once
 
 #include <atomic>
@@ -28,20 +28,20 @@ struct StreamPlan {
     std::string url;
     media::Credentials credentials;
 
-    // A renamed camera streams on as it is.
+    // Whether a running stream can go on: renaming a camera does not interrupt it.
     bool HasSourceOf(const StreamPlan& other) const { return url == other.url && credentials == other.credentials; }
 };
 
 class StreamWorker {
   public:
     // Starts the stream's thread, which takes no signals. Installation and kinds must outlive the worker. Throws
-    // std::system_error when there is no thread to be had.
+    // std::system_error when no thread can be started.
     StreamWorker(const base::Installation& installation, const media::SourceKinds& kinds, control::LiveStream stream,
                  StreamPlan plan, std::chrono::milliseconds no_data_limit);
 
     const StreamPlan& Plan() const { return plan_; }
 
-    // Where frames go beside the rings; null: nowhere.
+    // Where frames go besides the rings; null when the stream is not recorded.
     void SetRecording(std::shared_ptr<FrameQueue> queue);
 
     // Asks the thread to end and does not wait for it; the rings are gone when it has.

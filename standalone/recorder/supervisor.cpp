@@ -15,7 +15,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-constexpr std::chrono::milliseconds kWhileSomeEnd{20};
+constexpr std::chrono::milliseconds kPollWhileEnding{20};
 constexpr int kOrphanSearchSeconds = 60;
 
 }  // namespace
@@ -30,7 +30,7 @@ Supervisor::Supervisor(const base::Installation& installation, media::SourceKind
       catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }),
       recordings_(installation, no_data_limit) {
     DoEverySecond();
-    Reconcile();  // wishes may be older than this recorder
+    Reconcile();  // viewers' requests may be older than this recorder
 }
 
 void Supervisor::Step() {
@@ -61,7 +61,7 @@ bool Supervisor::Finish(std::chrono::milliseconds limit) {
 std::chrono::milliseconds Supervisor::TimeToNextStep() const {
     const std::chrono::microseconds left(std::max<std::int64_t>(0, next_second_us_ - base::MonotonicMicros()));
     const auto rounded_up = std::chrono::ceil<std::chrono::milliseconds>(left);
-    return some_end_ ? std::min(kWhileSomeEnd, rounded_up) : rounded_up;
+    return some_are_ending_ ? std::min(kPollWhileEnding, rounded_up) : rounded_up;
 }
 
 void Supervisor::DoEverySecond() {
@@ -92,12 +92,12 @@ void Supervisor::Reconcile() {
             plans.insert(*plan);
         }
     }
-    some_end_ = false;
+    some_are_ending_ = false;
     for (const auto& [stream, worker] : workers_) {
         const auto plan = plans.find(stream);
         if (plan == plans.end() || !plan->second.HasSourceOf(worker->Plan())) {
             worker->RequestStop();
-            some_end_ = true;
+            some_are_ending_ = true;
         }
     }
     DropEndedWorkers();

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps the set of running streams equal to the set of wanted ones.
+// Keeps exactly those live streams running that a viewer or a recording needs.
 //
-// Why so        Starting and stopping a camera takes time, and may take long; so this thread only compares the two sets,
-//               again and again, and never waits for a worker.
+// Why so        Connecting to a camera, or leaving one, may take long. So this thread only compares what runs with what
+//               is needed, every second and at each new request, and never waits for a worker.
 // Thread safety One thread.
 #pragma once
 
@@ -16,19 +16,19 @@
 #include "standalone/control/common_config.h"
 #include "standalone/control/demand.h"
 #include "standalone/recorder/catalog.h"
-#include "standalone/recorder/recordings.h"
+#include "standalone/recorder/recording_supervisor.h"
 #include "standalone/recorder/stream_worker.h"
 
 namespace lookhaven::recorder {
 
 class Supervisor {
   public:
-    // Removes what a dead recorder of this installation left. The installation must outlive the supervisor. Throws
-    // std::system_error when the shared tables cannot be made.
+    // Removes the shared memory that a dead recorder of this installation left. The installation must outlive the
+    // supervisor. Throws std::system_error when the shared tables cannot be made.
     Supervisor(const base::Installation& installation, media::SourceKinds kinds,
                std::chrono::milliseconds no_data_limit);
 
-    // One pass: waits up to a second for something to do and does it. A signal cuts the wait.
+    // One pass: waits up to a second for something to do and does it. A signal ends the wait early.
     void Step();
 
     // Stops all threads. False when one of them did not end within the limit; the process must then leave without
@@ -48,12 +48,12 @@ class Supervisor {
     control::Demand demand_;
     control::CommonConfigKeeper common_config_;
     Catalog catalog_;
-    Recordings recordings_;
+    RecordingSupervisor recordings_;
     std::map<control::LiveStream, std::unique_ptr<StreamWorker>> workers_;
     std::int64_t next_second_us_ = 0;
     std::int64_t seconds_ = 0;
     bool common_config_refreshed_ = true;
-    bool some_end_ = false;
+    bool some_are_ending_ = false;
     std::string reported_failure_;
 };
 

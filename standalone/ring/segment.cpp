@@ -156,7 +156,8 @@ const Entry* View::EntryAt(const Place& place) const {
     }
     const auto* entry = reinterpret_cast<const Entry*>(Memory(place));
     const bool possible =
-        entry->length >= 1 && entry->length <= kMaxDataBytes && entry->offset >= 0 && entry->offset < entry->length &&
+        entry->length >= 1 && entry->length <= base::kMaxFrameBytes && entry->offset >= 0 &&
+        entry->offset < entry->length &&
         sizeof(Entry) + static_cast<std::uint64_t>(entry->length) <= std::uint64_t{place.blocks} * kBlockBytes;
     return possible ? entry : nullptr;
 }

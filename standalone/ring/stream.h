@@ -8,9 +8,11 @@
 #include <string>
 #include <vector>
 
+#include "standalone/base/video.h"
+
 namespace lookhaven::ring {
 
-enum class Medium : std::int32_t { kVideo = 0, kAudio = 1 };
+using base::Medium;
 
 struct StreamId {
     std::int32_t camera = 0;
@@ -22,7 +24,6 @@ struct StreamId {
 
 constexpr std::size_t kMaxCodecLength = 31;
 constexpr std::size_t kMaxExtraBytes = 1024;
-constexpr std::int32_t kMaxDataBytes = 4194303;  // of one entry; the least is 1
 
 // Fixed for the life of a segment: a change of any field retires it.
 struct StreamFormat {

@@ -153,7 +153,7 @@ bool Writer::Ring::Write(const Frame& frame) {
     if (!attachment_) {
         Open();  // a move failed half-way
     }
-    if (frame.data.empty() || frame.data.size() > static_cast<std::size_t>(kMaxDataBytes) || frame.offset < 0 ||
+    if (frame.data.empty() || frame.data.size() > static_cast<std::size_t>(base::kMaxFrameBytes) || frame.offset < 0 ||
         static_cast<std::size_t>(frame.offset) >= frame.data.size()) {
         return Drop();
     }

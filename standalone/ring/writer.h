@@ -21,7 +21,7 @@ namespace lookhaven::ring {
 
 // One frame to write. The span is borrowed for the call.
 struct Frame {
-    std::span<const unsigned char> data;  // 1 … kMaxDataBytes
+    std::span<const unsigned char> data;  // 1 … base::kMaxFrameBytes
     std::int32_t offset = 0;              // of the picture within the data
     bool is_key = false;
     std::int64_t timestamp_micros = 0;

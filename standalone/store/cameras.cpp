@@ -14,7 +14,6 @@ namespace {
 
 constexpr std::size_t kMaxNameBytes = 255;
 constexpr std::size_t kMaxCredentialBytes = 255;
-constexpr int kMaxSizePixels = 8192;
 constexpr int kMaxFps = 120;
 
 void Require(bool holds, const char* rule) {
@@ -32,7 +31,7 @@ void RequireProfile(const CameraProfile& profile) {
     Require(IsSource(profile.source),
             "a camera's source begins with rtsp://, http://, https://, file: or test:, holds no"
             " account or password, and has at most 2048 bytes");
-    Require(IsWithin(profile.width, kMaxSizePixels) && IsWithin(profile.height, kMaxSizePixels),
+    Require(IsWithin(profile.width, base::kMaxSidePixels) && IsWithin(profile.height, base::kMaxSidePixels),
             "a picture is at most 8192 by 8192 pixels");
     Require(IsWithin(profile.fps, kMaxFps), "a camera sends at most 120 frames per second");
 }
@@ -40,9 +39,7 @@ void RequireProfile(const CameraProfile& profile) {
 void RequireCamera(const Camera& camera) {
     Require(!camera.name.empty() && IsPlainText(camera.name, kMaxNameBytes),
             "a camera's name is 1 to 255 bytes of UTF-8 without control characters");
-    const VideoType type = camera.video_type;
-    Require(type == VideoType::kMjpeg || type == VideoType::kH264 || type == VideoType::kH265,
-            "a camera's video is MJPEG, H.264 or H.265");
+    Require(base::IsVideo(camera.video_type), "a camera's video is MJPEG, H.264 or H.265");
     bool seen[kProfileCount] = {};
     for (const CameraProfile& profile : camera.profiles) {
         RequireProfile(profile);
@@ -93,7 +90,7 @@ std::vector<Camera> Fetch(soci::session& sql, int first, int last) {
     while (rows.fetch()) {
         if (cameras.empty() || cameras.back().id != camera.id) {
             camera.enabled = enabled != 0;
-            camera.video_type = static_cast<VideoType>(type);
+            camera.video_type = static_cast<base::Codec>(type);
             camera.ptz = ptz != 0;
             camera.audio = audio != 0;
             cameras.push_back(camera);

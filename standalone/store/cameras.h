@@ -7,12 +7,10 @@
 #include <string>
 #include <vector>
 
+#include "standalone/base/video.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::store {
-
-// The numbers are stored, and go to clients.
-enum class VideoType : int { kMjpeg = 1, kH264 = 3, kH265 = 6 };
 
 constexpr int kProfileCount = 3;
 
@@ -29,7 +27,7 @@ struct Camera {
     int id = 0;        // from 1, never used twice, since recordings carry it
     std::string name;  // UTF-8, 1 to 255 bytes
     bool enabled = true;
-    VideoType video_type = VideoType::kMjpeg;
+    base::Codec video_type = base::Codec::kMjpeg;
     int live_profile = 0;  // the number of the profile that the live view shows
     bool ptz = false;
     bool audio = false;

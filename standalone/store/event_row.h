@@ -46,7 +46,7 @@ struct EventRow {
         event.end_s = end;
         event.size_bytes = size;
         event.recording = recording != 0;
-        event.video_type = static_cast<VideoType>(video_type);
+        event.video_type = static_cast<base::Codec>(video_type);
         event.archived = archived != 0;
         event.demo = demo != 0;
         return event;

@@ -43,7 +43,7 @@ void Search(soci::session& sql, const EventFilter& filter, Number limit, const E
     const Number begin = filter.begin_s;
     const Number end = filter.end_s;
     // Nothing starts before this and still reaches the span.
-    const Number earliest = std::max<Number>(begin, kMaxEventSeconds) - kMaxEventSeconds;
+    const Number earliest = std::max<Number>(begin, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds;
     const int finished_only = filter.finished_only;
     int camera = 0;
     EventRow row;

@@ -18,7 +18,7 @@ constexpr std::size_t kMaxCodecBytes = 32;
 constexpr int kRowsAtOnce = 10'000;
 
 void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
-    if (start_s < 0 || end_s < start_s || end_s - start_s > kMaxEventSeconds) {
+    if (start_s < 0 || end_s < start_s || end_s - start_s > base::kMaxRecordingSeconds) {
         throw InvalidRecord("an event ends at most 7200 seconds after it starts, and not before");
     }
 }

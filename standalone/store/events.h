@@ -4,7 +4,7 @@
 //
 // Why so        The file is the record, the row is how it is found. So a row is made after its file exists and removed
 //               before the file goes: a row never points at nothing. There is no row per frame.
-// Invariants    (1) begins before it ends, and at most kMaxEventSeconds later: what touches a span of time is found by
+// Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found by
 //                   looking at a bounded stretch of the index (camera, start), however many events there are.
 //               (2) Ids come from one counter with those of marks and are never used twice.
 #pragma once
@@ -23,12 +23,6 @@
 
 namespace lookhaven::store {
 
-constexpr std::int64_t kMaxEventSeconds = 7200;
-
-// Why it was recorded; the numbers are stored, and go to clients.
-constexpr int kReasonContinuous = 1;
-constexpr int kReasonAlarm = 3;
-
 struct Event {
     int id = 0;
     int camera_id = 0;
@@ -36,10 +30,10 @@ struct Event {
     std::int64_t start_s = 0;
     std::int64_t end_s = 0;  // of an event that grows, its last second on the mount
     bool recording = false;  // still being written
-    int reason = kReasonContinuous;
+    int reason = base::kReasonContinuous;
     int frame_count = 0;
     std::int64_t size_bytes = 0;
-    VideoType video_type = VideoType::kMjpeg;
+    base::Codec video_type = base::Codec::kMjpeg;
     std::string audio_codec;  // empty when silent
     int width = 0;
     int height = 0;

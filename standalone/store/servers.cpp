@@ -94,7 +94,7 @@ std::vector<RemoteCamera> FetchCameras(soci::session& sql, const std::string& co
     rows.execute();
     std::vector<RemoteCamera> cameras;
     while (rows.fetch()) {
-        camera.video_type = static_cast<VideoType>(video_type);
+        camera.video_type = static_cast<base::Codec>(video_type);
         camera.audio = audio != 0;
         cameras.push_back(camera);
     }
@@ -115,8 +115,7 @@ void RequireValid(const RemoteCamera& camera) {
     if (camera.id_on_server < 1) {
         throw InvalidRecord("a camera's id on its server is a number from 1");
     }
-    if (camera.video_type != VideoType::kMjpeg && camera.video_type != VideoType::kH264 &&
-        camera.video_type != VideoType::kH265) {
+    if (!base::IsVideo(camera.video_type)) {
         throw InvalidRecord("a camera sends MJPEG, H.264 or H.265");
     }
 }

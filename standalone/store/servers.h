@@ -27,7 +27,7 @@ struct RemoteCamera {
     int server_id = 0;
     int id_on_server = 0;
     std::string name = {};  // UTF-8, 1 to 255 bytes
-    VideoType video_type = VideoType::kMjpeg;
+    base::Codec video_type = base::Codec::kMjpeg;
     bool audio = false;
 };
 

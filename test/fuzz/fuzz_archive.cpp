@@ -35,7 +35,7 @@ void Require(bool condition) {
 void Check(const std::vector<archive::FrameEntry>& frames, std::uint64_t size) {
     std::uint64_t end = 0;
     for (const archive::FrameEntry& frame : frames) {
-        Require(frame.offset >= end && frame.size > 0 && frame.size <= archive::kMaxFrameBytes);
+        Require(frame.offset >= end && frame.size > 0 && frame.size <= base::kMaxFrameBytes);
         end = frame.offset + frame.size;
     }
     Require(end <= size);

@@ -93,12 +93,12 @@ TEST_F(FrameIndex, ZerosAtTheEndAfterAPowerCutAreNoFrames) {
 TEST_F(FrameIndex, RefusesEntriesThatNoWriterMakes) {
     const FrameEntry good = frames_[0];
     const std::vector<std::vector<FrameEntry>> rows = {
-        {{good.offset, good.size, 0, false}},                                      // begins without a key frame
-        {good, {good.offset + 5, 10, 40, true}},                                   // overlaps the frame before
-        {{good.offset, 0, 0, true}},                                               // empty
-        {{good.offset, kMaxFrameBytes + 1, 0, true}},                              // too large
-        {{~std::uint64_t{0} - 5, 10, 0, true}},                                    // wraps round
-        {good, {good.offset + 20, 10, (kMaxRecordingSeconds + 61) * 1000, true}},  // too late
+        {{good.offset, good.size, 0, false}},                                            // begins without a key frame
+        {good, {good.offset + 5, 10, 40, true}},                                         // overlaps the frame before
+        {{good.offset, 0, 0, true}},                                                     // empty
+        {{good.offset, base::kMaxFrameBytes + 1, 0, true}},                              // too large
+        {{~std::uint64_t{0} - 5, 10, 0, true}},                                          // wraps round
+        {good, {good.offset + 20, 10, (base::kMaxRecordingSeconds + 61) * 1000, true}},  // too late
     };
     for (const auto& row : rows) {
         std::filesystem::remove(path_);

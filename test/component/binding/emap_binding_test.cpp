@@ -45,7 +45,7 @@ class EmapBinding : public testing::Test {
         users.DenyItem(2, DeniableItem::kIoModule, 5);
         store::Cameras(records_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
         servers_.Add({.name = "Annex", .address = "192.0.2.7", .port = 8080, .certificate = kCertificate}, kSecret);
-        servers_.PutCamera({.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = store::VideoType::kH264});
+        servers_.PutCamera({.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = base::Codec::kH264});
         emaps_.Add({.name = "Ground floor"});
         Call(1);
     }

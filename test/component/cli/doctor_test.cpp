@@ -147,7 +147,7 @@ TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
     const pid_t recorder = ::fork();
     if (recorder == 0) {
         const ring::Writer writer(
-            installation, {1, 0, ring::Medium::kVideo},
+            installation, {1, 0, base::Medium::kVideo},
             {.codec = "MJPEG", .extra_data = {}, .width = 64, .height = 48, .every_frame_is_key = true},
             ring::GeometryFor({.every_frame_is_key = true}));
         _exit(0);  // as if killed

@@ -78,9 +78,9 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
 TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
     store::Store store = Open();
     store::Events events(store);
-    const int first = AddRow(events, 1, kStart, store::kReasonContinuous, false);
-    const int second = AddRow(events, 2, kStart + 300, store::kReasonAlarm, false);
-    const int third = AddRow(events, 7, kStart + 600, store::kReasonContinuous, true);  // a camera that was removed
+    const int first = AddRow(events, 1, kStart, base::kReasonContinuous, false);
+    const int second = AddRow(events, 2, kStart + 300, base::kReasonAlarm, false);
+    const int third = AddRow(events, 7, kStart + 600, base::kReasonContinuous, true);  // a camera that was removed
     const std::map<std::string, std::vector<int>> rows = {
         {"", {third, second, first}},
         {"--limit 1", {third}},
@@ -169,7 +169,7 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
           {"mount remove 1", "", 65, "cameras record", ""},
           {"camera set 1 --mount 0", "", 0, "changed", ""}});
     store::Events events(store);
-    AddRow(events, 1, kStart, store::kReasonContinuous, false);
+    AddRow(events, 1, kStart, base::kReasonContinuous, false);
     Play({{"mount remove 1", "", 65, "--forget", ""},
           {"mount remove 1 --forget", "", 0, "files stay", ""},
           {"event list", "", 0, "no such event", ""}});
@@ -213,7 +213,7 @@ TEST_F(RecordingsTest, PlansAndGroupsAreChangedAndDenied) {
 TEST_F(RecordingsTest, MadeUpEventsFillATimeAndGoAsOne) {
     store::Store store = Open();
     store::Events events(store);
-    const int kept = AddRow(events, 1, kStart, store::kReasonContinuous, false);
+    const int kept = AddRow(events, 1, kStart, base::kReasonContinuous, false);
     Play({{"demo events", "", 64, "--count", ""},
           {"demo events --count 0", "", 64, "--count", ""},
           {"demo events --count 1000000 --days 1", "", 64, "do not fit", ""},

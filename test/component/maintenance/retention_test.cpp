@@ -32,7 +32,7 @@ constexpr std::int64_t kNow = kNoon + 86400;
 
 class RetentionTest : public testing::Test {
   protected:
-    RetentionTest() { MountFolder::Mark(footage_.Mount(), footage_.MountId()); }
+    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId()); }
     ~RetentionTest() override { fs::remove_all(folder_); }
 
     static fs::path MakeFolder() {
@@ -42,11 +42,11 @@ class RetentionTest : public testing::Test {
         return folder;
     }
 
-    Removed Run(std::int64_t max_bytes, std::int64_t max_age_s = 0) {
+    RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
-        return Retain(footage_.Records(), mount, kNow);
+        return EnforceRetention(footage_.Records(), mount, kNow);
     }
 
     std::vector<int> Left() {
@@ -68,7 +68,7 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     const int third = footage_.Record(1, kNoon + 160, 60);
     const std::vector<fs::path> gone = {footage_.FileOf(first), footage_.FileOf(second)};
     EXPECT_EQ(Run(3 * kEventBytes).events, 0) << "as much as is allowed";
-    const Removed removed = Run(kEventBytes);
+    const RetentionResult removed = Run(kEventBytes);
     EXPECT_EQ(removed.events, 2);
     EXPECT_EQ(removed.bytes, 2 * kEventBytes);
     EXPECT_THAT(Left(), ElementsAre(third));
@@ -114,7 +114,7 @@ TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
     const int event = footage_.Record(1, kNoon, 60);
     for (const auto& hide : std::initializer_list<std::function<void()>>{
              [&] { fs::remove(footage_.Mount() / ".lookhaven-mount"); },
-             [&] { MountFolder::Mark(footage_.Mount(), footage_.MountId() + 1); },
+             [&] { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId() + 1); },
              [&] { fs::rename(footage_.Mount(), folder_ / "unplugged"); },
          }) {
         hide();

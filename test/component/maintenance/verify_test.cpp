@@ -10,7 +10,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -32,7 +32,7 @@ class VerifyTest : public testing::Test {
   protected:
     // An installation with one recording, its row and an alert over it.
     VerifyTest() {
-        MountFolder::Mark(footage_.Mount(), footage_.MountId());
+        MountFolder::WriteMarker(footage_.Mount(), footage_.MountId());
         event_ = footage_.Record(1, kStartS, 4);
         file_ = footage_.FileOf(event_);
         fs::remove(file_);
@@ -134,8 +134,8 @@ TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
          "names no recording", "removed the event", kFrames},
         {"a lonely index", [&] { fs::copy(Index(), day / "130000-1.index"); }, "no recording to", "removed", kFrames},
         {"a lonely span", [&] { fs::copy(Span(), day / "130000-1.span"); }, "no mark has", "removed", kFrames},
-        {"a foreign span", [&] { test::Write(Span(), "x"); }, "span of mark", "written anew", kFrames},
-        {"no span", [&] { fs::remove(Span()); }, "span of mark", "written anew", kFrames},
+        {"a foreign span", [&] { test::Write(Span(), "x"); }, "span of mark", "written again", kFrames},
+        {"no span", [&] { fs::remove(Span()); }, "span of mark", "written again", kFrames},
     };
     for (const Damage& each : rows) {
         SCOPED_TRACE(each.what);
@@ -158,7 +158,7 @@ TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
         }
         EXPECT_EQ(Row().frame_count, each.frames);
         if (each.frames > 0) {
-            EXPECT_EQ(archive::Recording(file_).FrameCount(), each.frames);
+            EXPECT_EQ(archive::RecordingReader(file_).FrameCount(), each.frames);
         }
         fs::create_directories(day);
         test::Write(file_, recording);

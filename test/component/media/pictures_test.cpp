@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Pictures of a recording by number: any order gives what the order of showing gives, and what ffmpeg decodes.
+// Pictures of a recording by number: any order gives what presentation order gives, and what ffmpeg decodes.
 #include <algorithm>
 #include <fstream>
 #include <numeric>
@@ -28,7 +28,7 @@ Picture Read(PictureReader& reader, int index) {
     return picture;
 }
 
-std::vector<Picture> ReadAll(const archive::Recording& recording) {
+std::vector<Picture> ReadAll(const archive::RecordingReader& recording) {
     PictureReader reader(recording);
     std::vector<Picture> pictures;
     for (int i = 0; i < recording.FrameCount(); ++i) {
@@ -42,7 +42,7 @@ TEST(PictureReader, AnyOrderGivesThePicturesThatFfmpegDecodes) {
         SCOPED_TRACE(options);
         const ArchiveFolder folder;
         Record(MakeClip(options), folder / "a.mkv");
-        const archive::Recording recording(folder / "a.mkv");
+        const archive::RecordingReader recording(folder / "a.mkv");
         const std::vector<Picture> pictures = ReadAll(recording);
         ASSERT_EQ(pictures.size(), 100U);
         if (options == kMjpeg) {
@@ -53,13 +53,13 @@ TEST(PictureReader, AnyOrderGivesThePicturesThatFfmpegDecodes) {
             all.write(reinterpret_cast<const char*>(picture.data()), static_cast<std::streamsize>(picture.size()));
         }
         all.close();
-        // The likeness of the least alike frame, in decibels: a frame more or less, or wrong colours, is far below 30.
-        const std::string likeness =
+        // The PSNR of the worst frame: a frame more or less, or wrong colours, is far below 30 dB.
+        const std::string psnr =
             Shell("cd " + folder.Path().string() +
                   " && ffmpeg -v info -r 25 -i all.mjpeg -r 25 -i a.mkv -lavfi "
                   "'[0:v]format=rgb24[a];[1:v]format=rgb24[b];[a][b]psnr' -f null - 2>&1 | grep -o 'min:[0-9.inf]*'");
-        ASSERT_THAT(likeness, testing::StartsWith("min:"));
-        EXPECT_GT(std::stod(likeness.substr(4)), 30) << likeness;
+        ASSERT_THAT(psnr, testing::StartsWith("min:"));
+        EXPECT_GT(std::stod(psnr.substr(4)), 30) << psnr;
 
         std::mt19937 random(5);
         PictureReader reader(recording);
@@ -74,9 +74,9 @@ TEST(PictureReader, FollowsARecordingThatGrowsAndGoesOnWhenItIsDeleted) {
     const ArchiveFolder folder;
     const Clip& clip = MakeClip(kH264);
     Record(clip, folder / "whole.mkv");
-    const std::vector<Picture> pictures = ReadAll(archive::Recording(folder / "whole.mkv"));
+    const std::vector<Picture> pictures = ReadAll(archive::RecordingReader(folder / "whole.mkv"));
     RecordingWriter writer(folder / "a.mkv", clip.format, 4'000'000'000'000, 1);
-    archive::Recording recording(folder / "a.mkv");
+    archive::RecordingReader recording(folder / "a.mkv");
     PictureReader reader(recording);
     for (int i = 0; i < 100; ++i) {
         writer.Write(clip.At(static_cast<std::size_t>(i)));
@@ -95,7 +95,7 @@ TEST(PictureReader, RefusesWhatDoesNotFitAndWhatIsGone) {
     for (const char* options : {kMjpeg, kH264}) {
         const ArchiveFolder folder;
         Record(MakeClip(options), folder / "a.mkv");
-        const archive::Recording recording(folder / "a.mkv");
+        const archive::RecordingReader recording(folder / "a.mkv");
         PictureReader reader(recording);
         std::vector<std::uint8_t> small(500);
         EXPECT_THROW(reader.Read(3, small), SourceError);
@@ -110,7 +110,7 @@ TEST(PictureReader, RefusesWhatDoesNotFitAndWhatIsGone) {
 TEST(PictureReader, SurvivesDamagedFrames) {
     const ArchiveFolder folder;
     Record(MakeClip(kH264), folder / "a.mkv");
-    const archive::Recording recording(folder / "a.mkv");
+    const archive::RecordingReader recording(folder / "a.mkv");
     const std::vector<Picture> pictures = ReadAll(recording);
     std::string bytes = Contents(folder / "a.mkv");
     std::mt19937 random(11);

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Recordings of every format, as ffprobe sees them; killed at any point, on a full disk, cut, without an index.
+#include <atomic>
 #include <csignal>
+#include <cstdio>
 #include <random>
 #include <thread>
 
@@ -11,7 +13,7 @@
 #include <sys/resource.h>
 #include <sys/wait.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/archive/repair.h"
 #include "standalone/base/clock.h"
 #include "test/support/footage/archive_folder.h"
@@ -24,7 +26,7 @@ namespace {
 using namespace media;
 
 std::vector<archive::FrameEntry> Entries(const std::filesystem::path& recording) {
-    const archive::Recording opened(recording);
+    const archive::RecordingReader opened(recording);
     const auto entries = opened.Entries(0);
     return {entries.begin(), entries.end()};
 }
@@ -50,12 +52,12 @@ TEST(RecordingWriter, OtherProgramsReadEveryFormatAndALostIndexComesBack) {
         EXPECT_THAT(Probe(path), testing::MatchesRegex(row.probed));
         EXPECT_EQ(Shell("ffprobe -v error -show_entries format_tags=creation_time -of csv=p=0 " + path.string()),
                   "2026-03-01T08:15:30.000000Z\n");
-        const archive::Recording recording(path);
+        const archive::RecordingReader recording(path);
         EXPECT_NEAR(recording.FrameRate(), 25, 0.1);
         EXPECT_FALSE(recording.Grows());
         const std::vector<archive::FrameEntry> written = Entries(path);
         std::filesystem::remove(archive::IndexPathOf(path));
-        EXPECT_THROW(archive::Recording{path}, std::system_error);
+        EXPECT_THROW(archive::RecordingReader{path}, std::system_error);
         const archive::Contents contents = archive::CloseCrashed(path);
         EXPECT_EQ(contents.frame_count, 100);
         EXPECT_EQ(contents.duration_ms, 4000);
@@ -64,22 +66,24 @@ TEST(RecordingWriter, OtherProgramsReadEveryFormatAndALostIndexComesBack) {
     }
 }
 
-// What a child process has handed to its writer, seen by the test: the capture time of each frame.
-struct Handed {
+// What a child process has passed to its writer, as the test sees it through shared memory.
+struct Written {
     std::atomic<int> count{0};
-    std::int64_t times_us[5000] = {};
+    std::int64_t times_us[5000] = {};          // capture times
+    std::atomic<std::int64_t> returned_us{0};  // when the last Write that has returned was called
 };
 
-[[noreturn]] void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int length, Handed& handed) {
+[[noreturn]] void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int length, Written& written) {
     RecordingWriter writer(path, clip.format, base::WallMillis(), 1);
     for (int i = 0; i < length; ++i) {
         Packet packet = clip.At(static_cast<std::size_t>(i) % clip.packets.size());
         packet.timestamp_us = base::MonotonicMicros();
         if (packet.medium == Medium::kVideo) {
-            handed.times_us[handed.count] = packet.timestamp_us;
-            handed.count++;
+            written.times_us[written.count] = packet.timestamp_us;
+            written.count++;
         }
         writer.Write(packet);
+        written.returned_us = packet.timestamp_us;
         std::this_thread::sleep_for(std::chrono::milliseconds(4));
     }
     writer.Close();
@@ -87,23 +91,26 @@ struct Handed {
     ::_exit(0);
 }
 
-TEST(RecordingWriter, LosesLessThanASecondWhenKilledAnywhere) {
+// Whatever was captured half a second before a Write that returned is on the disk, however slow the machine is.
+TEST(RecordingWriter, LosesHalfASecondAtMostWhenKilledAnywhere) {
     constexpr int kBatches = 10;
     constexpr int kAtOnce = 10;
     const Clip* clips[] = {&MakeClip(kMjpeg), &MakeClip(kH264, "-c:a aac -ar 16000")};
-    std::mt19937 random(std::random_device{}());
+    const unsigned seed = std::random_device{}();
+    std::printf("seed %u\n", seed);
+    std::mt19937 random(seed);
     for (int batch = 0; batch < kBatches; ++batch) {
         const ArchiveFolder folder;
-        auto* handed =
-            new (::mmap(nullptr, kAtOnce * sizeof(Handed), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0))
-                Handed[kAtOnce];
+        auto* written =
+            new (::mmap(nullptr, kAtOnce * sizeof(Written), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0))
+                Written[kAtOnce];
         std::vector<std::pair<std::int64_t, std::pair<pid_t, int>>> kills;
         for (int i = 0; i < kAtOnce; ++i) {
             const int length = 30 + static_cast<int>(random() % 400);
             const pid_t pid = ::fork();
             ASSERT_GE(pid, 0);
             if (pid == 0) {
-                RecordUntilKilled(*clips[i % 2], folder / (std::to_string(i) + ".mkv"), length, handed[i]);
+                RecordUntilKilled(*clips[i % 2], folder / (std::to_string(i) + ".mkv"), length, written[i]);
             }
             kills.push_back(
                 {base::MonotonicMicros() + 20'000 + static_cast<std::int64_t>(random() % 2'000'000), {pid, i}});
@@ -113,24 +120,23 @@ TEST(RecordingWriter, LosesLessThanASecondWhenKilledAnywhere) {
             std::this_thread::sleep_for(
                 std::chrono::microseconds(std::max<std::int64_t>(0, time_us - base::MonotonicMicros())));
             ::kill(child.first, SIGKILL);
-            const std::int64_t killed_us = base::MonotonicMicros();
             int status = 0;
             ASSERT_EQ(::waitpid(child.first, &status, 0), child.first);
             ASSERT_TRUE(WIFSIGNALED(status)) << "the child failed by itself";
-            const Handed& seen = handed[child.second];
+            const Written& seen = written[child.second];
             const auto old = std::count_if(seen.times_us, seen.times_us + seen.count,
-                                           [&](std::int64_t us) { return us < killed_us - 1'000'000; });
+                                           [&](std::int64_t us) { return us < seen.returned_us - 500'000; });
             const std::filesystem::path path = folder / (std::to_string(child.second) + ".mkv");
             const int frames = std::filesystem::exists(path) ? archive::CloseCrashed(path).frame_count : 0;
             ASSERT_GE(frames, old) << "of " << seen.count << " frames";
             if (frames > 0) {
-                ASSERT_EQ(archive::Recording(path).FrameCount(), frames);
+                ASSERT_EQ(archive::RecordingReader(path).FrameCount(), frames);
                 const char* codec = child.second % 2 == 0 ? "mjpeg," : "h264,";
                 ASSERT_THAT(Probe(path), testing::AllOf(testing::StartsWith(codec + std::to_string(frames) + "\n"),
                                                         testing::Not(testing::HasSubstr("rror"))));
             }
         }
-        ::munmap(handed, kAtOnce * sizeof(Handed));
+        ::munmap(written, kAtOnce * sizeof(Written));
     }
 }
 
@@ -139,7 +145,7 @@ TEST(RecordingWriter, IsReadWhileItIsWritten) {
     const Clip& clip = MakeClip(kMjpeg);
     const auto frames = clip.Frames();
     RecordingWriter writer(folder / "a.mkv", clip.format, 4'000'000'000'000, 1);
-    archive::Recording recording(folder / "a.mkv");
+    archive::RecordingReader recording(folder / "a.mkv");
     for (std::size_t i = 0; i < frames.size(); ++i) {
         writer.Write(clip.At(i));
         writer.Flush();
@@ -183,8 +189,8 @@ TEST(RecordingWriter, AFullDiskLeavesWhatWasFlushed) {
         writer.Close();
         ::setrlimit(RLIMIT_FSIZE, &before);
         EXPECT_GT(writer.FrameCount(), 0);
-        EXPECT_EQ(archive::Recording(path).FrameCount(), writer.FrameCount());
-        EXPECT_FALSE(archive::Recording(path).Grows());
+        EXPECT_EQ(archive::RecordingReader(path).FrameCount(), writer.FrameCount());
+        EXPECT_FALSE(archive::RecordingReader(path).Grows());
         EXPECT_EQ(Probe(path), "mjpeg," + std::to_string(writer.FrameCount()) + "\n");
     }
     std::signal(SIGXFSZ, old_handler);
@@ -224,10 +230,7 @@ TEST(CloseCrashed, SavesWhatIsWholeOfACutOrDamagedRecording) {
             ASSERT_LE(left.back().offset + left.back().size, std::filesystem::file_size(path));
         }
         if (round % 2 == 0) {
-            ASSERT_EQ(saved, [&] {
-                const auto whole = archive::CloseCrashed(path).frame_count;
-                return whole;
-            }()) << "done twice it gives something else";
+            ASSERT_EQ(saved, archive::CloseCrashed(path).frame_count) << "done twice it gives something else";
             const auto in_file = std::count_if(frames.begin(), frames.end(),
                                                [&](const auto& frame) { return frame.offset + frame.size <= place; });
             ASSERT_LE(saved, in_file);

@@ -38,7 +38,7 @@ TEST_F(RecorderTest, WhateverASlowViewerTakesFromARingDecodes) {
     for (const Row& row : {Row{"entries run out first", {.index_slots = 32, .arena_bytes = 1 << 20}},
                            Row{"memory runs out first", {.index_slots = 4096, .arena_bytes = 1 << 15}}}) {
         SCOPED_TRACE(row.name);
-        const ring::StreamId id{1, ++stream, ring::Medium::kVideo};
+        const ring::StreamId id{1, ++stream, base::Medium::kVideo};
         ring::Writer writer(*installation_, id, {"H264", {}, kWidth, kHeight, false}, row.geometry);
         ring::Position position;
         ring::StartRead(writer.Address(), &position);

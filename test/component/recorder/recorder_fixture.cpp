@@ -69,7 +69,7 @@ std::size_t Child::Count(const char* kind) const {
     return static_cast<std::size_t>(std::distance(begin(entries), end(entries)));
 }
 
-Viewer::Viewer(const base::Installation& installation, int camera, ring::Medium medium)
+Viewer::Viewer(const base::Installation& installation, int camera, base::Medium medium)
     : installation_(installation),
       id_{camera, 0, medium},
       demand_(installation) {}
@@ -225,7 +225,7 @@ std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data
     return count;
 }
 
-void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames, const char* codec) {
+void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t min_key_frames, const char* codec) {
     std::size_t key_frames = 0;
     for (std::size_t first = 0; first < entries.size(); ++first) {
         if (entries[first].key_frame) {
@@ -234,7 +234,7 @@ void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_
             EXPECT_EQ(Decoded(codec, {}, run), run.size()) << "from entry " << first;
         }
     }
-    EXPECT_GE(key_frames, least_key_frames);
+    EXPECT_GE(key_frames, min_key_frames);
 }
 
 }  // namespace lookhaven::test

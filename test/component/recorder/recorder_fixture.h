@@ -20,7 +20,7 @@
 
 namespace lookhaven::test {
 
-// Asks the condition until it holds or the time is over; true when it held.
+// Polls the condition until it holds or the limit is over; true when it held.
 bool Eventually(const std::function<bool()>& condition, std::chrono::milliseconds limit = std::chrono::seconds(10));
 
 // A program that dies with the test.
@@ -48,20 +48,20 @@ struct Seen {
     std::int64_t timestamp_us = 0;
 };
 
-// Watches one stream, and wants it for as long as it is asked for frames.
+// Watches one stream, and requests it from the recorder for as long as frames are read.
 class Viewer {
   public:
-    Viewer(const base::Installation& installation, int camera, ring::Medium medium = ring::Medium::kVideo);
+    Viewer(const base::Installation& installation, int camera, base::Medium medium = base::Medium::kVideo);
     Viewer(const Viewer&) = delete;
     Viewer& operator=(const Viewer&) = delete;
     ~Viewer() { Leave(); }
 
-    // The next entry of the run, attaching anew when the ring was retired. Fails the test when none comes in time.
+    // The next entry of the run; attaches again when the ring was retired. Fails the test when none comes in time.
     Seen Next(std::chrono::milliseconds limit = std::chrono::seconds(20));
     std::vector<Seen> Take(std::size_t count);
-    // Frames can be found in the ring it is attached to.
+    // The ring has a current frame.
     bool HasPicture();
-    // Attached to a ring that its writer goes on with.
+    // Attached to a ring that is not retired.
     bool IsCurrent() const { return ring_ != nullptr && !ring::IsRetired(ring_); }
     const void* Ring() const { return ring_; }
 
@@ -94,11 +94,11 @@ class RecorderTest : public testing::Test {
     std::optional<base::Installation> installation_;
 };
 
-// How many pictures or sound blocks come out of a decoder that is given these; stops at the first that it refuses.
+// How many pictures or audio blocks a decoder makes of these entries; stops at the first that it refuses.
 std::size_t Decoded(const char* codec, std::span<const unsigned char> extra_data, std::span<const Seen> entries);
 
-// Every run of entries that begins with a key frame decodes whole.
-void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t least_key_frames,
+// Decoding succeeds from every key frame on, and there are at least so many of them.
+void ExpectDecodesFromEveryKeyFrame(const std::vector<Seen>& entries, std::size_t min_key_frames,
                                     const char* codec = "h264");
 
 }  // namespace lookhaven::test

@@ -53,26 +53,25 @@ TEST_F(RecorderTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
     const std::size_t threads = recorder.Count("task");
     const std::size_t segments = Segments();
     const void* ring = viewer.Ring();
-    for (const char* trouble : {"stalls", "vanishes", "sends huge frames", "sends a page"}) {
-        SCOPED_TRACE(trouble);
-        const bool vanishes = trouble[0] == 'v';
-        if (vanishes) {
-            camera.Vanish();
-        } else if (trouble[0] == 's') {
-            camera.SetMood(std::string(trouble) == "stalls"         ? MjpegCamera::Mood::kStall
-                           : std::string(trouble) == "sends a page" ? MjpegCamera::Mood::kPage
-                                                                    : MjpegCamera::Mood::kHuge);
-        }
-        // A page is seen by a new connection only.
-        if (std::string(trouble) == "sends a page") {
-            camera.Vanish();
-            camera.Return();
-        }
+    using Mood = MjpegCamera::Mood;
+    struct Trouble {
+        const char* name;
+        std::function<void()> begins;
+        std::function<void()> ends = [] {};
+    };
+    const Trouble troubles[] = {
+        {"stalls", [&] { camera.SetMood(Mood::kStall); }},
+        {"vanishes", [&] { camera.Vanish(); }, [&] { camera.Return(); }},
+        {"sends huge frames", [&] { camera.SetMood(Mood::kHuge); }},
+        {"sends a page, which a new connection sees",
+         [&] { camera.SetMood(Mood::kPage), camera.Vanish(), camera.Return(); }},
+    };
+    for (const Trouble& trouble : troubles) {
+        SCOPED_TRACE(trouble.name);
+        trouble.begins();
         ASSERT_TRUE(Eventually([&] { return !viewer.HasPicture(); })) << "an old picture passes for a live one";
-        camera.SetMood(MjpegCamera::Mood::kFlow);
-        if (vanishes) {
-            camera.Return();
-        }
+        camera.SetMood(Mood::kFlow);
+        trouble.ends();
         EXPECT_GE(MjpegCamera::NumberOf(viewer.Next().data), 0);
     }
     EXPECT_EQ(viewer.Ring(), ring) << "a camera that returns unchanged keeps its ring";
@@ -114,23 +113,23 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     EXPECT_EQ(LogLines("does not answer with Motion JPEG"), 1u) << "a line for each attempt";
 }
 
-TEST_F(RecorderTest, StreamRunsWhileItIsWanted) {
+TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
     MakeStore();
     const int camera = AddCamera(kSmallPattern);
     const Child recorder = StartRecorder();
     ASSERT_TRUE(Eventually([&] { return LogLines("started") > 0; }));
-    ASSERT_EQ(Segments(), 0u) << "runs unwanted";
+    ASSERT_EQ(Segments(), 0u) << "runs without a request";
     std::size_t threads = 0;
-    const std::int64_t wanted_us = base::MonotonicMicros();
+    const std::int64_t requested_us = base::MonotonicMicros();
     {
         Viewer viewer(*installation_, camera);
         viewer.Next();
-        EXPECT_LT(base::MonotonicMicros() - wanted_us, 1'000'000);
+        EXPECT_LT(base::MonotonicMicros() - requested_us, 1'000'000);
         threads = recorder.Count("task");
     }
     // Viewers may be silent for a pause of ten seconds.
     ASSERT_TRUE(Eventually([&] { return Segments() == 0; }, seconds(30)));
-    EXPECT_GE(base::MonotonicMicros() - wanted_us, 15'000'000);
+    EXPECT_GE(base::MonotonicMicros() - requested_us, 15'000'000);
     EXPECT_TRUE(Eventually([&] { return recorder.Count("task") == threads - 1; }));
 }
 
@@ -185,7 +184,7 @@ TEST_F(RecorderTest, SuccessorOfAKilledRecorderGoesOnInItsRings) {
     MakeStore();
     const int camera = AddCamera("test:h264?size=160x120&audio=aac");
     Viewer viewer(*installation_, camera);
-    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Viewer listener(*installation_, camera, base::Medium::kAudio);
     Child first = StartRecorder();
     const Seen before = viewer.Next();
     listener.Next();
@@ -218,7 +217,7 @@ TEST_F(RecorderTest, PatternDecodesWithSound) {
     const int camera = AddCamera("test:h264?size=320x240&gop=10&audio=aac");
     const Child recorder = StartRecorder();
     Viewer viewer(*installation_, camera);
-    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Viewer listener(*installation_, camera, base::Medium::kAudio);
     const std::vector<Seen> pictures = viewer.Take(45);
     const std::vector<Seen> blocks = listener.Take(100);
     ExpectDecodesFromEveryKeyFrame(pictures, 4);
@@ -238,7 +237,7 @@ TEST_F(RecorderTest, SilentCameraHasAnEmptyRingOfSound) {
     const Child recorder = StartRecorder();
     Viewer(*installation_, camera).Next();
     EXPECT_EQ(Segments(), 2u);
-    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Viewer listener(*installation_, camera, base::Medium::kAudio);
     EXPECT_FALSE(listener.HasPicture());
     EXPECT_NE(listener.Ring(), nullptr);
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder keeps of its cameras on either engine: through its own sudden death, around an alarm, on a full disk.
+// What the recorder keeps of its cameras on either engine: when it is killed, around an alarm, on a full disk.
 #include <csignal>
 #include <cstdlib>
 #include <fstream>
@@ -14,10 +14,10 @@
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
-#include "standalone/maintenance/recording_state.h"
+#include "standalone/maintenance/recording_status.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -104,7 +104,7 @@ class RecordingTest : public RecorderTest, public testing::WithParamInterface<st
     }
 };
 
-TEST_P(RecordingTest, SuddenDeathCostsNoMoreThanTheLastSecond) {
+TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
     for (const char* source : {"test:mjpeg?size=160x120&fps=25", "test:h264?size=160x120&fps=25&gop=25&audio=aac"}) {
         SetPlan(AddCamera(source), store::RecordMode::kAlways);
     }
@@ -113,7 +113,7 @@ TEST_P(RecordingTest, SuddenDeathCostsNoMoreThanTheLastSecond) {
     const int kills = GetParam() == "Sqlite" ? 80 : 20;
     for (int kill = 0; kill < kills; ++kill) {
         Child recorder = StartRecorder();
-        std::this_thread::sleep_for(milliseconds(random() % 1600));  // anywhere in what it does, tidying up too
+        std::this_thread::sleep_for(milliseconds(random() % 1600));  // at any point, recovery included
         recorder.Signal(SIGKILL);
         ASSERT_TRUE(recorder.Wait());
         const std::int64_t now_ms = base::WallMillis();
@@ -131,7 +131,7 @@ TEST_P(RecordingTest, SuddenDeathCostsNoMoreThanTheLastSecond) {
     ExpectSound();
     for (const auto& [path, end_ms] : died_ms) {
         if (fs::exists(Folder() / path)) {
-            const archive::Recording recording(Folder() / path);
+            const archive::RecordingReader recording(Folder() / path);
             EXPECT_LE(end_ms - recording.StartWallMs() - recording.TimeOf(recording.FrameCount() - 1), 1000) << path;
         } else {
             EXPECT_LT(end_ms - archive::ParsePath(path)->start_s * 1000, 2000) << path << " lost more than a second";
@@ -155,7 +155,7 @@ TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
             const auto found = marks.Find(store::MarkKind::kAlert, id);
             return found && found->state == store::MarkState::kSaved;
         })) << Log();
-        const archive::Recording span(Folder() / marks.Find(store::MarkKind::kAlert, id)->path);
+        const archive::RecordingReader span(Folder() / marks.Find(store::MarkKind::kAlert, id)->path);
         EXPECT_GT(span.FrameCount(), 40) << "two seconds of footage at least";
         SetPlan(camera, store::RecordMode::kNever);
     }
@@ -187,7 +187,7 @@ TEST_P(RecordingTest, AFullDiskPausesRecordingAloneUntilThereIsRoom) {
     SetPlan(camera, store::RecordMode::kAlways);
     const Child recorder = StartRecorder();
     const auto is_in = [&](maintenance::RecordingState state) {
-        const auto states = maintenance::ReadRecordingStates(*installation_);
+        const auto states = maintenance::ReadRecordingStatus(*installation_);
         return states.size() == 1 && states.front().state == state;
     };
     Viewer viewer(*installation_, camera);

@@ -15,7 +15,7 @@ namespace lookhaven::test {
 
 namespace {
 
-void ExpectStill(const Seen& key_frame, media::Codec codec, media::PictureSize expected = {320, 240}) {
+void ExpectStill(const Seen& key_frame, base::Codec codec, media::PictureSize expected = {320, 240}) {
     const std::vector<std::uint8_t> jpeg = media::JpegOfKeyFrame(
         codec, {reinterpret_cast<const std::uint8_t*>(key_frame.data.data()), key_frame.data.size()});
     const std::optional<media::PictureSize> size = media::JpegSize(jpeg);
@@ -45,7 +45,7 @@ TEST_F(RtspTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
     const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + "/live");
     const Child recorder = StartRecorder();
     Viewer viewer(*installation_, camera);
-    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Viewer listener(*installation_, camera, base::Medium::kAudio);
     ExpectDecodesFromEveryKeyFrame(viewer.Take(60), 2);
     const std::vector<Seen> blocks = listener.Take(20);
     ASSERT_FALSE(HasFailure());
@@ -99,12 +99,12 @@ TEST_F(RtspTest, EveryCodecComesThroughAndDecodes) {
         SCOPED_TRACE(row.path);
         const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + row.path);
         Viewer viewer(*installation_, camera);
-        Viewer listener(*installation_, camera, ring::Medium::kAudio);
+        Viewer listener(*installation_, camera, base::Medium::kAudio);
         const std::vector<Seen> pictures = viewer.Take(40);
         ExpectDecodesFromEveryKeyFrame(pictures, 1, row.video_decoder);
         ASSERT_FALSE(HasFailure());
         ExpectStill(*std::find_if(begin(pictures), end(pictures), [](const Seen& seen) { return seen.key_frame; }),
-                    row.video == std::string("H265") ? media::Codec::kH265 : media::Codec::kH264);
+                    row.video == std::string("H265") ? base::Codec::kH265 : base::Codec::kH264);
         EXPECT_STREQ(ring::Codec(viewer.Ring()), row.video);
         EXPECT_FALSE(ring::ExtraData(viewer.Ring()).empty());
         if (row.audio_decoder != nullptr) {
@@ -124,14 +124,14 @@ TEST_F(RtspTest, PictureOfAnotherSizeGoesOnInARingOfItsOwnAndTheSoundStays) {
     const Child recorder = StartRecorder("5");
     const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + "/live");
     Viewer viewer(*installation_, camera);
-    Viewer listener(*installation_, camera, ring::Medium::kAudio);
+    Viewer listener(*installation_, camera, base::Medium::kAudio);
     ExpectDecodesFromEveryKeyFrame(viewer.Take(30), 1);
     listener.Take(5);
     ASSERT_FALSE(HasFailure());
     EXPECT_EQ(ring::Width(viewer.Ring()), 320);
     const std::span extra = ring::ExtraData(viewer.Ring());
     const std::vector<unsigned char> extra_before(extra.begin(), extra.end());
-    void* ring_before = ring::Attach(*installation_, {camera, 0, ring::Medium::kVideo});
+    void* ring_before = ring::Attach(*installation_, {camera, 0, base::Medium::kVideo});
     rtsp_camera.Signal(SIGWINCH);
     std::vector<Seen> pictures(1);
     ASSERT_TRUE(Eventually([&] {
@@ -144,7 +144,7 @@ TEST_F(RtspTest, PictureOfAnotherSizeGoesOnInARingOfItsOwnAndTheSoundStays) {
         pictures.push_back(std::move(picture));
     }
     ASSERT_TRUE(pictures[0].key_frame);
-    ExpectStill(pictures[0], media::Codec::kH264, {640, 480});
+    ExpectStill(pictures[0], base::Codec::kH264, {640, 480});
     ExpectDecodesFromEveryKeyFrame(pictures, 2);
     EXPECT_FALSE(std::ranges::equal(ring::ExtraData(viewer.Ring()), extra_before));
     EXPECT_TRUE(listener.IsCurrent()) << "the sound has not changed";

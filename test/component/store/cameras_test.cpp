@@ -35,7 +35,7 @@ TEST_P(CameraTest, RecordsComeBackAsTheyWerePut) {
         Camera camera{
             .name = name,
             .enabled = false,
-            .video_type = VideoType::kH265,
+            .video_type = base::Codec::kH265,
             .live_profile = 2,
             .ptz = true,
             .audio = true,
@@ -79,7 +79,7 @@ TEST_P(CameraTest, BrokenRecordsChangeNothing) {
     refused("size", [](Camera& camera) { camera.profiles[0].width = 8193; });
     refused("height", [](Camera& camera) { camera.profiles[0].height = -1; });
     refused("rate", [](Camera& camera) { camera.profiles[0].fps = 121; });
-    refused("codec", [](Camera& camera) { camera.video_type = static_cast<VideoType>(2); });
+    refused("codec", [](Camera& camera) { camera.video_type = static_cast<base::Codec>(2); });
     EXPECT_TRUE(cameras_.List().empty());
     EXPECT_EQ(settings_.Revision(), before);
 }

@@ -78,12 +78,12 @@ class EventTest : public StoreTest {
         event.camera_id = Draw(1, 5);
         event.mount_id = Draw(1, 3);
         event.start_s = kDay + Draw(0, 40) * 600;  // many start together
-        event.end_s = event.start_s + (Draw(0, 9) == 0 ? kMaxEventSeconds : Draw(0, 1200));
+        event.end_s = event.start_s + (Draw(0, 9) == 0 ? base::kMaxRecordingSeconds : Draw(0, 1200));
         event.recording = Draw(0, 9) == 0;
-        event.reason = Draw(0, 1) == 0 ? kReasonContinuous : kReasonAlarm;
+        event.reason = Draw(0, 1) == 0 ? base::kReasonContinuous : base::kReasonAlarm;
         event.frame_count = Draw(0, 100'000);
         event.size_bytes = 3'000'000'000LL * Draw(0, 3);
-        event.video_type = Draw(0, 1) == 0 ? VideoType::kMjpeg : VideoType::kH265;
+        event.video_type = Draw(0, 1) == 0 ? base::Codec::kMjpeg : base::Codec::kH265;
         event.audio_codec = Draw(0, 1) == 0 ? "" : "aac";
         event.width = Draw(16, 8192);
         event.height = Draw(16, 8192);
@@ -190,8 +190,8 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_EQ(events_.Find(event.id)->end_s, event.start_s + 1);
     EXPECT_EQ(events_.Find(event.id)->size_bytes, 5'000'000'000);
     EXPECT_THROW(events_.Grow(event.id, event.start_s - 1, 25, 1), InvalidRecord);
-    EXPECT_THROW(events_.Finish(event.id, event.start_s + kMaxEventSeconds + 1, 25, 1), InvalidRecord);
-    EXPECT_TRUE(events_.Finish(event.id, event.start_s + kMaxEventSeconds, 50, 6));
+    EXPECT_THROW(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds + 1, 25, 1), InvalidRecord);
+    EXPECT_TRUE(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds, 50, 6));
     EXPECT_THAT(events_.Open(), IsEmpty());
     EXPECT_THAT(Ids(events_.Oldest(event.mount_id, 1)), ElementsAre(event.id));
     EXPECT_TRUE(events_.SetArchived(event.id, true));
@@ -203,9 +203,10 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_EQ(events_.Remove(std::vector{event.id, unknown, event.id}), 1);
     EXPECT_FALSE(events_.Find(event.id));
     for (const auto& spoil : std::initializer_list<void (*)(Event&)>{
-             [](Event& e) { e.end_s = e.start_s - 1; }, [](Event& e) { e.end_s = e.start_s + kMaxEventSeconds + 1; },
-             [](Event& e) { e.start_s = -5; }, [](Event& e) { e.camera_id = 0; }, [](Event& e) { e.mount_id = 0; },
-             [](Event& e) { e.path = "a\nb"; }, [](Event& e) { e.size_bytes = -1; }}) {
+             [](Event& e) { e.end_s = e.start_s - 1; },
+             [](Event& e) { e.end_s = e.start_s + base::kMaxRecordingSeconds + 1; }, [](Event& e) { e.start_s = -5; },
+             [](Event& e) { e.camera_id = 0; }, [](Event& e) { e.mount_id = 0; }, [](Event& e) { e.path = "a\nb"; },
+             [](Event& e) { e.size_bytes = -1; }}) {
         Event broken = event;
         spoil(broken);
         EXPECT_THROW(events_.Begin(broken), InvalidRecord) << Text(broken);

@@ -18,27 +18,27 @@ class MjpegCamera {
   public:
     enum class Mood {
         kFlow,       // 25 frames a second
-        kStall,      // the connection stays, nothing comes
-        kHuge,       // frames larger than any camera sends in earnest
-        kPage,       // a page of text instead of a stream
+        kStall,      // the connection stays open, nothing comes
+        kHuge,       // frames above base::kMaxFrameBytes
+        kPage,       // an HTML page instead of a stream
         kNoLengths,  // frames without their lengths, ended by the boundary
     };
 
-    // Listens on 127.0.0.1, on a free port. With a login ("user:password") it turns others away.
+    // Listens on a free port of 127.0.0.1. With a login ("user:password") it refuses other clients.
     explicit MjpegCamera(std::string login = "");
     ~MjpegCamera();
 
     std::string Url() const { return "http://127.0.0.1:" + std::to_string(port_) + "/video"; }
-    // How it answers from the next frame or request on.
+    // Applies from the next frame or request on.
     void SetMood(Mood mood) { mood_ = mood; }
-    // Cuts all connections and refuses new ones, until Return, which takes the same port again.
+    // Closes all connections and refuses new ones until Return, which listens on the same port again.
     void Vanish();
     void Return();
     int Connections() const { return connections_; }
 
-    // The frame of that number: a JPEG picture of 64 x 48 that carries the number, the same bytes every time.
+    // A JPEG picture of 64 x 48 that contains the number; the same bytes every time.
     static std::string Frame(std::uint32_t number);
-    // The number of the frame, or -1 when it is none of ours, byte by byte.
+    // The number in the frame; -1 when it is not exactly a frame of this camera.
     static std::int64_t NumberOf(const std::string& frame);
 
   private:

@@ -5,8 +5,8 @@
 //
 //   rtsp-camera <port>     0 takes a free one; the port is printed when the camera is ready
 //
-// SIGUSR1 withholds the picture, while the sound goes on; SIGUSR2 gives it back. SIGWINCH doubles its width and height.
-// To stall, stop the process (SIGSTOP); to vanish, kill it. The pipeline ends with its parent.
+// SIGUSR1 stops the picture while the sound continues; SIGUSR2 resumes it. SIGWINCH doubles its width and height.
+// SIGSTOP makes the camera stall, SIGKILL makes it vanish. It ends with its parent.
 #include <csignal>
 #include <cstdio>
 #include <string>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A folder of a test's own with recordings that have an index and no contents.
+// A temporary folder, and recordings in it that have an index and no contents.
 #pragma once
 
 #include <filesystem>
@@ -46,7 +46,7 @@ inline archive::IndexHeader PlainHeader(std::int64_t start_wall_ms) {
     return {"H264", "AAC", 640, 360, start_wall_ms, 1};
 }
 
-// Frames of 10 bytes, 20 apart; each tenth of them is a key frame.
+// Frames of 10 bytes, 20 apart; every tenth is a key frame.
 inline std::vector<archive::FrameEntry> FramesAt(const std::vector<std::uint32_t>& times_ms) {
     std::vector<archive::FrameEntry> frames;
     for (const std::uint32_t time_ms : times_ms) {

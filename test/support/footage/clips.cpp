@@ -24,14 +24,14 @@ std::string Shell(const std::string& command) {
 
 media::Packet Clip::At(std::size_t number) const {
     const OwnedPacket& packet = packets.at(number);
-    const bool is_video = packet.medium == media::Medium::kVideo;
+    const bool is_video = packet.medium == base::Medium::kVideo;
     return {packet.medium, packet.data, packet.time_us, packet.key_frame, is_video ? &format.video : &*format.audio};
 }
 
 std::vector<std::vector<std::uint8_t>> Clip::Frames() const {
     std::vector<std::vector<std::uint8_t>> frames;
     for (const OwnedPacket& packet : packets) {
-        if (packet.medium == media::Medium::kVideo) {
+        if (packet.medium == base::Medium::kVideo) {
             frames.push_back(packet.data);
         }
     }
@@ -55,7 +55,7 @@ const Clip& MakeClip(const std::string& video_options, const std::string& audio_
     while (const auto packet = demuxer.Read()) {
         clip.packets.push_back(
             {{packet->data.begin(), packet->data.end()}, packet->medium, packet->timestamp_us, packet->key_frame});
-        if (packet->medium == media::Medium::kVideo) {
+        if (packet->medium == base::Medium::kVideo) {
             clip.format.video = *packet->format;
         }
     }

@@ -13,27 +13,28 @@
 
 namespace lookhaven::test {
 
-// What the shell command printed, its errors too.
+// What the shell command printed, errors included.
 std::string Shell(const std::string& command);
 
 // A packet that owns what it needs.
 struct OwnedPacket {
     std::vector<std::uint8_t> data;
-    media::Medium medium = media::Medium::kVideo;
+    base::Medium medium = base::Medium::kVideo;
     std::int64_t time_us = 0;
     bool key_frame = false;
 };
 
 struct Clip {
-    media::RecordingFormat format;
+    media::MediaFormat format;
     std::vector<OwnedPacket> packets;
 
     media::Packet At(std::size_t number) const;
-    // The picture frames' bytes in the order of the file.
+    // The video frames' bytes in file order.
     std::vector<std::vector<std::uint8_t>> Frames() const;
 };
 
-// Four seconds of a moving 160x120 picture, 25 a second, coded by ffmpeg with these options. Each is made once.
+// Four seconds of a moving 160x120 picture at 25 frames per second, encoded by ffmpeg with these options. Made once
+// each.
 const Clip& MakeClip(const std::string& video_options, const std::string& audio_options = "");
 
 inline const char* const kMjpeg = "-c:v mjpeg -q:v 4 -pix_fmt yuvj420p";
@@ -46,8 +47,8 @@ inline const char* const kH265 = "-c:v libx265 -preset ultrafast -bf 2 -g 25 -x2
 void Record(const Clip& clip, const std::filesystem::path& path, bool close = true, std::size_t count = SIZE_MAX,
             std::int64_t start_wall_ms = 1'772'352'930'000);
 
-// Decodes all of the file. Each stream's codec and its number of frames, one per line ("h264,100"); and ffprobe's
-// complaints, if there are any.
+// Decodes the whole file. Each stream's codec and number of frames, one per line ("h264,100"), and ffprobe's
+// complaints.
 std::string Probe(const std::filesystem::path& path);
 
 }  // namespace lookhaven::test

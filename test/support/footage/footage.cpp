@@ -14,7 +14,7 @@ namespace lookhaven::test {
 
 WrittenRecording::WrittenRecording(const std::filesystem::path& path, std::int64_t start_wall_ms, int period_ms)
     : path_(path),
-      index_(archive::IndexPathOf(path), {"MJPEG", "", 640, 480, start_wall_ms, store::kReasonContinuous}),
+      index_(archive::IndexPathOf(path), {"MJPEG", "", 640, 480, start_wall_ms, base::kReasonContinuous}),
       period_ms_(period_ms) {
     std::ofstream(path_) << "head";
 }
@@ -63,7 +63,7 @@ int Footage::Record(int camera, std::int64_t start_s, int seconds) {
     WrittenRecording file(mount_ / event.path, start_s * 1000, 100);
     file.Append(event.frame_count);
     file.Finish();
-    archive::WriteRecordingLog(mount_ / std::to_string(camera), start_s, event.end_s, store::kReasonContinuous);
+    archive::WriteRecordingLog(mount_ / std::to_string(camera), start_s, event.end_s, base::kReasonContinuous);
     store::Events(records_).Begin(event);
     store::Events(records_).Finish(event.id, event.end_s, event.frame_count, event.size_bytes);
     return event.id;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recordings for tests: Motion JPEG in all that a player looks at, with a text for each picture.
+// Recordings for tests: Motion JPEG as far as a player looks, with a text instead of each picture.
 #pragma once
 
 #include <cstdint>
@@ -13,7 +13,7 @@
 
 namespace lookhaven::test {
 
-// Writes a recording frame by frame; "picture 3" is the frame 3. Without Finish it stays as one that grows.
+// Writes a recording frame by frame; frame 3 is "picture 3". Until Finish it is a growing one.
 class WrittenRecording {
   public:
     WrittenRecording(const std::filesystem::path& path, std::int64_t start_wall_ms, int period_ms);
@@ -34,7 +34,7 @@ class Footage {
 
     // A finished event of 10 pictures a second with its row and its files; returns its id.
     int Record(int camera, std::int64_t start_s, int seconds);
-    // An alert or POS event over the recorded event's span; returns its id.
+    // An alert or POS event with footage of the recorded event; returns its id.
     int Mark(int kind, int camera, std::int64_t start_s, int seconds, const std::string& text, int event);
     std::filesystem::path FileOf(int event);
     const std::filesystem::path& Mount() const { return mount_; }

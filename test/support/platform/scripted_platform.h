@@ -49,8 +49,9 @@ struct ScriptedFrame {
 
 enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
 
-// While one exists it is the platform of the process, and sleep, usleep, time, sigaction, shmdt and the state of standard
-// output are its script's. Every call is first recorded, then shown to on_call, which may change the script or throw.
+// While one exists it is the platform of the process, and sleep, usleep, time, sigaction, shmdt and the state of
+// standard output are its script's. Every call is first recorded, then shown to on_call, which may change the script or
+// throw.
 class ScriptedPlatform {
   public:
     ScriptedPlatform();

@@ -2,8 +2,8 @@
 //
 // A PostgreSQL server of a test's own, on a socket in a temporary folder; gone when the test is, however it ends.
 //
-// Why so        A guardian process holds the server: it stops it and removes the folder once its pipe to the test closes,
-//               which a crash or a kill of the test does too.
+// Why so        A guardian process holds the server: it stops it and removes the folder once its pipe to the test
+//               closes, which a crash or a kill of the test does too.
 #pragma once
 
 #include <filesystem>
@@ -17,8 +17,8 @@ namespace lookhaven::test {
 
 class TemporaryPostgres {
   public:
-    // Starts PostgreSQL 15 and waits until it answers. Throws std::runtime_error when it does not. Call it from a process
-    // with one thread.
+    // Starts PostgreSQL 15 and waits until it answers. Throws std::runtime_error when it does not. Call it from a
+    // process with one thread.
     TemporaryPostgres();
     ~TemporaryPostgres();
 

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The last seconds of a stream in memory, for what is to be recorded from before it was known to matter.
+// The last seconds of a stream in memory, so that an event can begin before its cause.
 //
 // Invariants    (1) Its first frame is a key frame.
-//               (2) It holds at least the running group of pictures, as long as that fits into kCapacityBytes.
+//               (2) It holds at least the current group of pictures, unless that exceeds kCapacityBytes.
 // Thread safety One thread.
 #pragma once
 
@@ -14,17 +14,17 @@
 
 namespace lookhaven::recorder {
 
-class PreRecord {
+class PreRecordBuffer {
   public:
     static constexpr std::size_t kCapacityBytes = 32 << 20;
 
     // Adds the frame and drops the oldest groups of pictures that are not needed for the last seconds or do not fit. A
-    // frame of another format than before begins anew.
+    // frame of another format than the last drops everything before it.
     void Add(Frame frame, std::int64_t seconds);
 
     bool IsEmpty() const { return frames_.empty(); }
     const Frame& First() const { return frames_.front(); }
-    // All frames, oldest first; none are left.
+    // All frames, oldest first; the buffer is empty afterwards.
     std::deque<Frame> TakeAll();
 
   private:

@@ -2,12 +2,12 @@
 //
 // Where one camera's events begin and end, on clocks that the test holds: nothing is lost between two of them, whatever
 // ends the first.
-#include "standalone/recorder/camera_recording.h"
+#include "standalone/recorder/camera_recorder.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
@@ -21,15 +21,15 @@ using maintenance::RecordingState;
 constexpr std::int64_t kNoonMs = 1'772'366'400'000;
 constexpr int kFps = 25;
 
-class CameraRecordingTest : public testing::Test {
+class CameraRecorderTest : public testing::Test {
   protected:
-    CameraRecordingTest() {
+    CameraRecorderTest() {
         for (const int mount : {1, 2}) {
             fs::create_directory(MountPath(mount));
-            maintenance::MountFolder::Mark(MountPath(mount), mount);
+            maintenance::MountFolder::WriteMarker(MountPath(mount), mount);
         }
-        order_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
-        recording_.SetOrder(order_);
+        request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
+        recorder_.SetRequest(request_);
     }
 
     fs::path MountPath(int mount) const { return folder_ / std::to_string(mount); }
@@ -38,16 +38,16 @@ class CameraRecordingTest : public testing::Test {
     // Until the recorder has numbers for events.
     void OpenStore() {
         store::Store::Migrate(StoreUrl());
-        for (int tries = 0; tries < 500 && !ledger_.HasId(); ++tries) {
-            ledger_.Refresh(4);
+        for (int tries = 0; tries < 500 && !rows_.HasId(); ++tries) {
+            rows_.Refresh(4);
             std::this_thread::sleep_for(std::chrono::milliseconds(10));
         }
-        ASSERT_TRUE(ledger_.HasId());
+        ASSERT_TRUE(rows_.HasId());
     }
 
-    void Order(const std::function<void(RecordingOrder&)>& change) {
-        change(order_);
-        recording_.SetOrder(order_);
+    void Request(const std::function<void(RecordingRequest&)>& change) {
+        change(request_);
+        recorder_.SetRequest(request_);
     }
 
     void Pass(double seconds, bool with_pictures = true) {
@@ -55,9 +55,9 @@ class CameraRecordingTest : public testing::Test {
             now_us_ += 1'000'000 / kFps;
             if (with_pictures) {
                 const test::OwnedPacket& packet = clip_.packets[fed_++ % clip_.packets.size()];
-                recording_.Take({format_, packet.medium, packet.data, now_us_, packet.key_frame});
+                recorder_.Take({format_, packet.medium, packet.data, now_us_, packet.key_frame});
             }
-            recording_.Tick();
+            recorder_.Tick();
         }
     }
 
@@ -80,16 +80,17 @@ class CameraRecordingTest : public testing::Test {
     std::int64_t wall_ahead_ms_ = kNoonMs;  // of the monotonic clock
     int rooms_wanted_ = 0;
     std::size_t fed_ = 0;
-    EventLedger ledger_{StoreUrl()};
-    RecordingOrder order_;
-    CameraRecording recording_{7,
-                               {ledger_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
-                                [this] { ++rooms_wanted_; }, 1'000'000}};
+    EventRowQueue rows_{StoreUrl()};
+    RecordingRequest request_;
+    CameraRecorder recorder_{7,
+                             {rows_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
+                              [this] { ++rooms_wanted_; }, 1'000'000}};
     const test::Clip& clip_ = test::MakeClip(test::kH264);  // a key frame each second
-    const std::shared_ptr<const RunFormat> format_ = std::make_shared<RunFormat>(RunFormat{clip_.format.video, {}});
+    const std::shared_ptr<const media::MediaFormat> format_ =
+        std::make_shared<media::MediaFormat>(media::MediaFormat{clip_.format.video, {}});
 };
 
-TEST_F(CameraRecordingTest, EventsEndWithoutLosingAFrameBetweenThem) {
+TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
     OpenStore();
     struct Row {
         const char* what;
@@ -99,11 +100,11 @@ TEST_F(CameraRecordingTest, EventsEndWithoutLosingAFrameBetweenThem) {
     };
     const Row rows[] = {
         {"nothing", [] {}, {10}},
-        {"the segments are short", [&] { order_.plan.segment_s = 4; }, {4, 4, 2}},
+        {"the segments are short", [&] { request_.plan.segment_s = 4; }, {4, 4, 2}},
         {"the clock jumps", [&] { wall_ahead_ms_ += 3'000; }, {3, 7}, 3'000},
         {"the clock is set back", [&] { wall_ahead_ms_ -= 3'600'000; }, {3, 7}, -3'600'000},
         {"the clock is put right", [&] { wall_ahead_ms_ -= 1'900; }, {10}, -1'900},
-        {"another mount", [&] { order_.plan.mount_id = 2, order_.plan.mount = MountPath(2); }, {3, 7}},
+        {"another mount", [&] { request_.plan.mount_id = 2, request_.plan.mount = MountPath(2); }, {3, 7}},
     };
     std::size_t known = 0;
     for (const Row& row : rows) {
@@ -112,35 +113,35 @@ TEST_F(CameraRecordingTest, EventsEndWithoutLosingAFrameBetweenThem) {
         fed_ = 0;
         Pass(2.48);
         row.happens();
-        recording_.SetOrder(order_);
+        recorder_.SetRequest(request_);
         Pass(7.52);
-        recording_.Close();
-        EXPECT_EQ(recording_.State(), RecordingState::kReady);
+        recorder_.Close();
+        EXPECT_EQ(recorder_.State(), RecordingState::kReady);
         const std::vector<fs::path> files = Files();
         ASSERT_EQ(files.size() - known, row.seconds.size());
         std::int64_t expected_ms = begin_ms;
         for (const int seconds : row.seconds) {
-            const archive::Recording event(files[known++]);
+            const archive::RecordingReader event(files[known++]);
             EXPECT_EQ(test::Probe(files[known - 1]), "h264," + std::to_string(seconds * kFps) + "\n");
             EXPECT_FALSE(event.Grows());
             EXPECT_NEAR(static_cast<double>(event.StartWallMs() - expected_ms), 40, 1);
             expected_ms += seconds * 1000 + (expected_ms == begin_ms ? row.step_ms : 0);
         }
-        order_.plan.segment_s = 60;
-        recording_.SetOrder(order_);
+        request_.plan.segment_s = 60;
+        recorder_.SetRequest(request_);
         OpenStore();  // more numbers
     }
 }
 
-TEST_F(CameraRecordingTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
+TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     Pass(2);
-    EXPECT_EQ(recording_.State(), RecordingState::kNoNumber) << "the store has not been there yet";
+    EXPECT_EQ(recorder_.State(), RecordingState::kNoNumber) << "the store has not been there yet";
     OpenStore();
     const auto is_recorded_again = [&] {
         fed_ = 0;
         Pass(3);
-        EXPECT_EQ(recording_.State(), RecordingState::kRecording);
-        EXPECT_GT(recording_.OpenEvent(), 0);
+        EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
+        EXPECT_GT(recorder_.OpenEvent(), 0);
         OpenStore();
     };
     is_recorded_again();
@@ -153,46 +154,46 @@ TEST_F(CameraRecordingTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     const Row rows[] = {
         {RecordingState::kReady, false, [] {}, [] {}},
         {RecordingState::kReady, true,
-         [&] { Order([](RecordingOrder& order) { order.plan.mode = store::RecordMode::kNever; }); },
-         [&] { Order([](RecordingOrder& order) { order.plan.mode = store::RecordMode::kAlways; }); }},
+         [&] { Request([](RecordingRequest& request) { request.plan.mode = store::RecordMode::kNever; }); },
+         [&] { Request([](RecordingRequest& request) { request.plan.mode = store::RecordMode::kAlways; }); }},
         {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
          [&] { fs::rename(hidden, MountPath(1)); }},
-        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::Mark(MountPath(1), 9); },
-         [&] { maintenance::MountFolder::Mark(MountPath(1), 1); }},
-        {RecordingState::kNoMount, true, [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 0; }); },
-         [&] { Order([](RecordingOrder& order) { order.plan.mount_id = 1; }); }},
+        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 9); },
+         [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 1); }},
+        {RecordingState::kNoMount, true, [&] { Request([](RecordingRequest& request) { request.plan.mount_id = 0; }); },
+         [&] { Request([](RecordingRequest& request) { request.plan.mount_id = 1; }); }},
     };
     for (const Row& row : rows) {
         SCOPED_TRACE(NameOf(row.state));
         row.happens();
         Pass(3, row.with_pictures);
-        EXPECT_EQ(recording_.State(), row.state);
-        EXPECT_EQ(recording_.OpenEvent(), 0);
+        EXPECT_EQ(recorder_.State(), row.state);
+        EXPECT_EQ(recorder_.OpenEvent(), 0);
         row.ends();
         is_recorded_again();
     }
     EXPECT_EQ(rooms_wanted_, 0);
-    recording_.Close();
+    recorder_.Close();
     for (const fs::path& file : Files()) {
-        EXPECT_FALSE(archive::Recording(file).Grows()) << file;
+        EXPECT_FALSE(archive::RecordingReader(file).Grows()) << file;
         EXPECT_THAT(test::Probe(file), testing::MatchesRegex("h264,[0-9]+\n"));
     }
 }
 
-TEST_F(CameraRecordingTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
+TEST_F(CameraRecorderTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
     OpenStore();
-    Order([](RecordingOrder& order) {
-        order.plan.mode = store::RecordMode::kNever;
-        order.plan.pre_s = 2;
+    Request([](RecordingRequest& request) {
+        request.plan.mode = store::RecordMode::kNever;
+        request.plan.pre_s = 2;
     });
     Pass(4.6);
     EXPECT_TRUE(Files().empty());
     const std::int64_t alarm_s = (wall_ahead_ms_ + now_us_ / 1000) / 1000;
-    Order([&](RecordingOrder& order) { order.marks_until_s = alarm_s + 3; });
+    Request([&](RecordingRequest& request) { request.marks_until_s = alarm_s + 3; });
     Pass(10);
     ASSERT_EQ(Files().size(), 1U);
-    const archive::Recording event(Files().front());
-    EXPECT_EQ(event.Header(0).reason, store::kReasonAlarm);
+    const archive::RecordingReader event(Files().front());
+    EXPECT_EQ(event.Header(0).reason, base::kReasonAlarm);
     EXPECT_LE(event.StartWallMs(), alarm_s * 1000 - 1000);
     const std::int64_t end_ms = event.StartWallMs() + event.TimeOf(event.FrameCount() - 1);
     EXPECT_NEAR(static_cast<double>(end_ms - (alarm_s + 3) * 1000), 0, 80);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One event as it is being recorded: its file, its row, its seconds in the recording log.
+// Writes one event while it is being recorded: its file, its row, its seconds in the recording log.
 //
 // Thread safety One thread.
 #pragma once
@@ -10,7 +10,7 @@
 #include <string>
 
 #include "standalone/media/recording_writer.h"
-#include "standalone/recorder/event_ledger.h"
+#include "standalone/recorder/event_row_queue.h"
 #include "standalone/recorder/frame_queue.h"
 
 namespace lookhaven::recorder {
@@ -22,23 +22,24 @@ struct EventStart {
     std::filesystem::path mount;
     std::int64_t wall_ms = 0;       // of the first frame
     std::int64_t timestamp_us = 0;  // likewise
-    int reason = store::kReasonContinuous;
+    int reason = base::kReasonContinuous;
 };
 
-class EventFile {
+class EventWriter {
   public:
-    // Makes the file; the row follows with the first frames on the disk. The ledger must outlive this object. Throws
-    // std::exception; then no file is left.
-    EventFile(const EventStart& start, const RunFormat& format, EventLedger& ledger);
+    // Creates the file; the row is put into the queue once the first frames are on the disk. Throws std::exception;
+    // then no file is left. The queue must outlive this object.
+    EventWriter(const EventStart& start, const media::MediaFormat& format, EventRowQueue& rows);
 
     const EventStart& Start() const { return start_; }
     bool Takes(const Frame& frame) const { return writer_.Takes(frame.Packet()); }
 
-    // These throw std::exception when the disk does not take it.
+    // Both throw std::exception when the disk fails; what was flushed before is kept.
     void Write(const Frame& frame);
     void Flush();
-    // Finishes file and row with what is on the disk, also after another call has thrown. Throws std::exception when the
-    // file cannot be finished; its row says then what was flushed, and verify finishes the file.
+    // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
+    // when the file cannot be finished; then the row describes what was flushed, and recovery or verify finishes the
+    // file.
     void Close();
 
   private:
@@ -46,7 +47,7 @@ class EventFile {
     void NoteProgress();
 
     const EventStart start_;
-    EventLedger& ledger_;
+    EventRowQueue& rows_;
     store::Event row_;
     media::RecordingWriter writer_;
     std::int64_t logged_until_s_;

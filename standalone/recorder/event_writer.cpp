@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/event_file.h"
+#include "standalone/recorder/event_writer.h"
 
 #include <algorithm>
 #include <utility>
@@ -11,13 +11,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-store::VideoType TypeOf(media::Codec codec) {
-    return codec == media::Codec::kH264   ? store::VideoType::kH264
-           : codec == media::Codec::kH265 ? store::VideoType::kH265
-                                          : store::VideoType::kMjpeg;
-}
-
-store::Event RowOf(const EventStart& start, const RunFormat& format) {
+store::Event RowOf(const EventStart& start, const media::MediaFormat& format) {
     store::Event row;
     row.id = start.id;
     row.camera_id = start.camera;
@@ -25,8 +19,8 @@ store::Event RowOf(const EventStart& start, const RunFormat& format) {
     row.start_s = start.wall_ms / 1000;
     row.recording = true;
     row.reason = start.reason;
-    row.video_type = TypeOf(format.video.codec);
-    row.audio_codec = format.audio ? media::CodecName(format.audio->codec) : "";
+    row.video_type = format.video.codec;
+    row.audio_codec = format.audio ? base::CodecName(format.audio->codec) : "";
     row.width = format.video.width;
     row.height = format.video.height;
     row.path = archive::PathOf({start.camera, row.start_s, start.id, archive::FileKind::kRecording});
@@ -40,24 +34,24 @@ std::filesystem::path PathWithFolder(const EventStart& start, const store::Event
 
 }  // namespace
 
-EventFile::EventFile(const EventStart& start, const RunFormat& format, EventLedger& ledger)
+EventWriter::EventWriter(const EventStart& start, const media::MediaFormat& format, EventRowQueue& rows)
     : start_(start),
-      ledger_(ledger),
+      rows_(rows),
       row_(RowOf(start, format)),
-      writer_(PathWithFolder(start, row_), {format.video, format.audio}, start.wall_ms, start.reason),
+      writer_(PathWithFolder(start, row_), format, start.wall_ms, start.reason),
       logged_until_s_(row_.start_s) {}
 
-void EventFile::Write(const Frame& frame) {
+void EventWriter::Write(const Frame& frame) {
     writer_.Write(frame.Packet());
     NoteProgress();
 }
 
-void EventFile::Flush() {
+void EventWriter::Flush() {
     writer_.Flush();
     NoteProgress();
 }
 
-void EventFile::Close() {
+void EventWriter::Close() {
     row_.recording = false;
     try {
         writer_.Close();
@@ -68,13 +62,13 @@ void EventFile::Close() {
     NoteProgress();
 }
 
-// The last second that was begun counts whole, and an event lasts one at least: what takes no time is never found.
-std::int64_t EventFile::EndS() const {
+// Rounded up to whole seconds, at least one: a search never finds an event without a duration.
+std::int64_t EventWriter::EndS() const {
     const std::int64_t end_s = (writer_.EndWallMs() + 999) / 1000;
-    return std::clamp(end_s, row_.start_s + 1, row_.start_s + store::kMaxEventSeconds);
+    return std::clamp(end_s, row_.start_s + 1, row_.start_s + base::kMaxRecordingSeconds);
 }
 
-void EventFile::NoteProgress() {
+void EventWriter::NoteProgress() {
     if (writer_.FrameCount() == row_.frame_count && row_.recording) {
         return;
     }
@@ -82,7 +76,7 @@ void EventFile::NoteProgress() {
     row_.size_bytes = static_cast<std::int64_t>(writer_.SizeBytes());
     row_.end_s = EndS();
     if (row_.frame_count > 0) {
-        ledger_.Put(row_);
+        rows_.Put(row_);
     }
     if (row_.end_s > logged_until_s_ && row_.frame_count > 0) {
         const std::int64_t begin_s = std::exchange(logged_until_s_, row_.end_s);

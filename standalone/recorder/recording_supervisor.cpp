@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/recordings.h"
+#include "standalone/recorder/recording_supervisor.h"
 
 #include <algorithm>
 #include <utility>
@@ -17,31 +17,32 @@ namespace {
 
 constexpr std::int64_t kRetentionUs = 10'000'000;
 
-// A mount that nothing was recorded to yet gets its mark; one that events are on and that lacks it is not there.
+// A mount without any events gets its marker file; one that has events but no marker is an unplugged disk.
 void MarkNewMounts(store::Store& store) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (mount.enabled && maintenance::MountFolder::IsUnmarked(mount.path) &&
+        if (mount.enabled && maintenance::MountFolder::HasNoMarker(mount.path) &&
             store::Events(store).Content(mount.id).events == 0) {
-            maintenance::MountFolder::Mark(mount.path, mount.id);
+            maintenance::MountFolder::WriteMarker(mount.path, mount.id);
         }
     }
 }
 
 }  // namespace
 
-Recordings::Recordings(const base::Installation& installation, std::chrono::milliseconds no_data_limit)
+RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
+                                         std::chrono::milliseconds no_data_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
-      ledger_(installation.StoreUrl()),
-      caretaker_(installation.StoreUrl(), "look after the recordings",
-                 [this](store::Store& store, const std::stop_token&) { Care(store); }) {}
+      rows_(installation.StoreUrl()),
+      maintenance_(installation.StoreUrl(), "maintain the recordings",
+                   [this](store::Store& store, const std::stop_token&) { Maintain(store); }) {}
 
-// Cameras whose plan is "never" and which a mark wants footage of now, and until when.
-std::map<int, std::int64_t> Recordings::MarkedCameras(const CatalogContents& catalog) const {
+// The cameras that a pending mark needs footage of now, and until when.
+std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
     std::map<int, std::int64_t> until_s;
     const std::int64_t now_s = base::WallMillis() / 1000;
-    for (const store::Mark& mark : ledger_.PendingMarks()) {
+    for (const store::Mark& mark : rows_.PendingMarks()) {
         if (catalog.cameras.contains(mark.camera_id) && mark.start_s <= now_s && now_s < mark.end_s) {
             until_s[mark.camera_id] = std::max(until_s[mark.camera_id], mark.end_s);
         }
@@ -49,16 +50,17 @@ std::map<int, std::int64_t> Recordings::MarkedCameras(const CatalogContents& cat
     return until_s;
 }
 
-void Recordings::Reconcile(const CatalogContents& catalog) {
+void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
-    std::erase_if(entries_, [](const auto& entry) { return entry.second.ends && entry.second.worker->HasEnded(); });
+    std::erase_if(entries_,
+                  [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
     const auto needs = [&](int camera, const CameraPlan& plan) {
         return plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera);
     };
     for (auto& [camera, entry] : entries_) {
         const auto plan = catalog.cameras.find(camera);
-        if (!entry.ends && (plan == catalog.cameras.end() || !needs(camera, plan->second))) {
-            entry.ends = true;
+        if (!entry.is_ending && (plan == catalog.cameras.end() || !needs(camera, plan->second))) {
+            entry.is_ending = true;
             entry.worker->RequestStop();
         }
     }
@@ -67,22 +69,22 @@ void Recordings::Reconcile(const CatalogContents& catalog) {
             continue;
         }
         Entry& entry = entries_[camera];
-        if (entry.ends) {
-            continue;  // begins anew once it has ended
+        if (entry.is_ending) {
+            continue;  // started again once it has ended
         }
         if (!entry.worker) {
-            const RecordingSurroundings surroundings{ledger_, base::MonotonicMicros, base::WallMillis,
-                                                     [this] { room_wanted_ = true; },
-                                                     std::chrono::microseconds(no_data_limit_).count()};
-            entry.worker = std::make_unique<RecordingWorker>(camera, surroundings, flush_requests_);
+            const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis,
+                                          [this] { needs_space_ = true; },
+                                          std::chrono::microseconds(no_data_limit_).count()};
+            entry.worker = std::make_unique<RecordingWorker>(camera, context, flush_requests_);
         }
         entry.stream = {camera, plan.stream};
-        entry.worker->SetOrder({plan, marked.contains(camera) ? marked.at(camera) : 0});
+        entry.worker->SetRequest({plan, marked.contains(camera) ? marked.at(camera) : 0});
     }
     AnswerFlushes();
 }
 
-void Recordings::AnswerFlushes() {
+void RecordingSupervisor::AnswerFlushes() {
     for (const std::int32_t event : flush_requests_.Pending()) {
         const auto open = std::ranges::find_if(
             entries_, [&](const auto& entry) { return entry.second.worker->OpenEvent() == event; });
@@ -94,16 +96,16 @@ void Recordings::AnswerFlushes() {
     }
 }
 
-void Recordings::DoEverySecond() {
-    ledger_.Refresh(entries_.size());
-    caretaker_.Ask();
-    std::vector<maintenance::CameraRecordingState> states;
+void RecordingSupervisor::DoEverySecond() {
+    rows_.Refresh(entries_.size());
+    maintenance_.Ask();
+    std::vector<maintenance::RecordingStatus> states;
     for (const auto& [camera, entry] : entries_) {
         states.push_back(entry.worker->State());
     }
     try {
         if (states != published_) {
-            maintenance::WriteRecordingStates(installation_, states);
+            maintenance::WriteRecordingStatus(installation_, states);
             published_ = std::move(states);
         }
     } catch (const std::exception& failure) {
@@ -111,55 +113,56 @@ void Recordings::DoEverySecond() {
     }
 }
 
-std::vector<control::LiveStream> Recordings::Wanted() const {
+std::vector<control::LiveStream> RecordingSupervisor::Wanted() const {
     std::vector<control::LiveStream> streams;
     for (const auto& [camera, entry] : entries_) {
-        if (!entry.ends) {
+        if (!entry.is_ending) {
             streams.push_back(entry.stream);
         }
     }
     return streams;
 }
 
-std::shared_ptr<FrameQueue> Recordings::QueueOf(control::LiveStream stream) const {
+std::shared_ptr<FrameQueue> RecordingSupervisor::QueueOf(control::LiveStream stream) const {
     const auto entry = entries_.find(stream.camera);
-    return entry != entries_.end() && !entry->second.ends && entry->second.stream == stream
+    return entry != entries_.end() && !entry->second.is_ending && entry->second.stream == stream
                ? entry->second.worker->Queue()
                : nullptr;
 }
 
-void Recordings::RequestStop() {
-    caretaker_.RequestStop();
+void RecordingSupervisor::RequestStop() {
+    maintenance_.RequestStop();
     for (auto& [camera, entry] : entries_) {
-        entry.ends = true;
+        entry.is_ending = true;
         entry.worker->RequestStop();
     }
 }
 
-bool Recordings::HasEnded() {
+bool RecordingSupervisor::HasEnded() {
     if (!std::ranges::all_of(entries_, [](const auto& entry) { return entry.second.worker->HasEnded(); })) {
         return false;
     }
     if (!std::exchange(stores_last_rows_, true)) {
-        ledger_.RequestStop();
+        rows_.RequestStop();
     }
-    return ledger_.HasEnded() && caretaker_.HasEnded();
+    return rows_.HasEnded() && maintenance_.HasEnded();
 }
 
-void Recordings::Care(store::Store& store) {
+void RecordingSupervisor::Maintain(store::Store& store) {
     const std::int64_t now_s = base::WallMillis() / 1000;
     MarkNewMounts(store);
-    if (const std::optional<int> first = ledger_.FirstOwnId(); first && !std::exchange(recovered_, true)) {
+    if (const std::optional<int> first = rows_.FirstOwnId(); first && !std::exchange(recovered_, true)) {
         maintenance::Recover(store, *first, now_s);
     }
     maintenance::CompleteMarks(store, now_s);
     const std::int64_t now_us = base::MonotonicMicros();
-    if (!room_wanted_.exchange(false) && now_us < next_retention_us_) {
+    if (!needs_space_.exchange(false) && now_us < next_retention_us_) {
         return;
     }
     next_retention_us_ = now_us + kRetentionUs;
     for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (const maintenance::Removed removed = maintenance::Retain(store, mount, now_s); removed.events > 0) {
+        if (const maintenance::RetentionResult removed = maintenance::EnforceRetention(store, mount, now_s);
+            removed.events > 0) {
             base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(removed.events) +
                           " old events");
         }

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/event_ledger.h"
+#include "standalone/recorder/event_row_queue.h"
 
 #include <algorithm>
 #include <utility>
@@ -10,16 +10,16 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// With segments of five minutes, a recorder gets through twenty minutes without its store.
+// With segments of five minutes, recording goes on for twenty minutes without the store.
 constexpr std::size_t kIdsPerCamera = 4;
 
 }  // namespace
 
-EventLedger::EventLedger(const std::string& store_url)
+EventRowQueue::EventRowQueue(const std::string& store_url)
     : thread_(store_url, "store the events, recording goes on",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
-std::optional<int> EventLedger::TakeId() {
+std::optional<int> EventRowQueue::TakeId() {
     const std::lock_guard lock(mutex_);
     if (reserve_.empty()) {
         return std::nullopt;
@@ -29,12 +29,12 @@ std::optional<int> EventLedger::TakeId() {
     return id;
 }
 
-bool EventLedger::HasId() const {
+bool EventRowQueue::HasId() const {
     const std::lock_guard lock(mutex_);
     return !reserve_.empty();
 }
 
-void EventLedger::Put(const store::Event& row) {
+void EventRowQueue::Put(const store::Event& row) {
     bool is_urgent = !row.recording;
     {
         const std::lock_guard lock(mutex_);
@@ -48,7 +48,7 @@ void EventLedger::Put(const store::Event& row) {
     }
 }
 
-void EventLedger::Refresh(std::size_t cameras) {
+void EventRowQueue::Refresh(std::size_t cameras) {
     {
         const std::lock_guard lock(mutex_);
         wanted_reserve_ = cameras * kIdsPerCamera;
@@ -56,22 +56,22 @@ void EventLedger::Refresh(std::size_t cameras) {
     thread_.Ask();
 }
 
-std::vector<store::Mark> EventLedger::PendingMarks() const {
+std::vector<store::Mark> EventRowQueue::PendingMarks() const {
     const std::lock_guard lock(mutex_);
     return pending_marks_;
 }
 
-std::optional<int> EventLedger::FirstOwnId() const {
+std::optional<int> EventRowQueue::FirstOwnId() const {
     const std::lock_guard lock(mutex_);
     return first_own_id_;
 }
 
-void EventLedger::RequestStop() {
+void EventRowQueue::RequestStop() {
     thread_.Ask();
     thread_.RequestStop();
 }
 
-void EventLedger::Work(store::Store& store) {
+void EventRowQueue::Work(store::Store& store) {
     store::Events events(store);
     std::vector<int> dirty;
     {
@@ -91,7 +91,7 @@ void EventLedger::Work(store::Store& store) {
     pending_marks_ = std::move(pending);
 }
 
-void EventLedger::FillReserve(store::Events& events) {
+void EventRowQueue::FillReserve(store::Events& events) {
     std::size_t missing = 0;
     bool is_first = false;
     {
@@ -113,7 +113,7 @@ void EventLedger::FillReserve(store::Events& events) {
     }
 }
 
-void EventLedger::StoreRow(store::Events& events, int id) {
+void EventRowQueue::StoreRow(store::Events& events, int id) {
     Entry entry;
     {
         const std::lock_guard lock(mutex_);
@@ -130,7 +130,7 @@ void EventLedger::StoreRow(store::Events& events, int id) {
             events.Finish(id, row.end_s, row.frame_count, row.size_bytes);
         }
     } catch (const store::AlreadyExists&) {
-        // An answer was lost on the way, or somebody took the file in. What the row says now goes in with the next round.
+        // The answer to an earlier insert was lost, or verify has adopted the file. The next round updates the row.
         const std::lock_guard lock(mutex_);
         entries_.at(id).is_stored = true;
         entries_.at(id).is_dirty = true;

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder's side of the event rows: it takes rows in at any time and stores them when it can.
+// Event rows on their way to the store, and event ids fetched in advance.
 //
-// Why so        A store that is away or hangs must not cost a frame. So rows wait here, the newest state of each, and ids
-//               for events to come are kept in reserve.
-// Invariants    (1) A row is stored after its file exists: whoever puts it says so by putting it.
-//               (2) No row is lost while the recorder lives. When it dies, upkeep/recovery.h finds the files.
+// Why so        No frame may be lost because the store is unavailable or hangs. So rows wait here, the newest state of
+//               each, and ids for future events are kept in reserve.
+// Invariants    (1) A row is stored only after its file exists: a caller puts a row when its file is on the disk.
+//               (2) No row is lost while the recorder runs. If it dies, maintenance/recovery.h finds the files.
 // Thread safety Any thread; nothing here waits for the store.
 #pragma once
 
@@ -22,26 +22,27 @@
 
 namespace lookhaven::recorder {
 
-class EventLedger {
+class EventRowQueue {
   public:
-    // Starts the thread. Throws std::system_error when there is no thread to be had.
-    explicit EventLedger(const std::string& store_url);
+    // Starts the thread. Throws std::system_error when no thread can be started.
+    explicit EventRowQueue(const std::string& store_url);
 
-    // An id for an event that begins now; nothing when the store was away for too long.
+    // An id for an event that begins now; nothing when the reserve is used up because the store has been unavailable.
     std::optional<int> TakeId();
     bool HasId() const;
-    // The row as it shall be from now on; finished when it is no longer recording.
+    // Queues the row's newest state, which replaces one that is not stored yet. A row that is no longer recording is
+    // final.
     void Put(const store::Event& row);
 
-    // Stores what changed, looks for marks and fills the reserve for so many cameras, soon.
+    // Soon: stores what changed, reads the pending marks and fills the reserve for that many cameras. Does not wait.
     void Refresh(std::size_t cameras);
 
     // The marks whose footage is still to come, as of the last refresh.
     std::vector<store::Mark> PendingMarks() const;
-    // Every id from here on was given to this recorder or is not in use yet; nothing before the store was reached.
+    // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
     std::optional<int> FirstOwnId() const;
 
-    // As StoreThread's; rows that were put before are stored first.
+    // As in StoreThread; rows already queued are stored first.
     void RequestStop();
     bool HasEnded() const { return thread_.HasEnded(); }
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/pre_record.h"
+#include "standalone/recorder/pre_record_buffer.h"
 
 #include <algorithm>
 #include <utility>
@@ -9,12 +9,12 @@ namespace lookhaven::recorder {
 namespace {
 
 bool BeginsGroup(const Frame& frame) {
-    return frame.medium == media::Medium::kVideo && frame.key_frame;
+    return frame.medium == base::Medium::kVideo && frame.key_frame;
 }
 
 }  // namespace
 
-void PreRecord::Add(Frame frame, std::int64_t seconds) {
+void PreRecordBuffer::Add(Frame frame, std::int64_t seconds) {
     if (!frames_.empty() && frames_.front().format != frame.format) {
         TakeAll();
     }
@@ -33,19 +33,19 @@ void PreRecord::Add(Frame frame, std::int64_t seconds) {
     }
 }
 
-std::deque<Frame> PreRecord::TakeAll() {
+std::deque<Frame> PreRecordBuffer::TakeAll() {
     bytes_ = 0;
     return std::exchange(frames_, {});
 }
 
-void PreRecord::DropFirstGroup() {
+void PreRecordBuffer::DropFirstGroup() {
     do {
         bytes_ -= frames_.front().data.size();
         frames_.pop_front();
     } while (!frames_.empty() && !BeginsGroup(frames_.front()));
 }
 
-const Frame* PreRecord::SecondKeyFrame() const {
+const Frame* PreRecordBuffer::SecondKeyFrame() const {
     const auto next = frames_.empty() ? frames_.end() : std::find_if(frames_.begin() + 1, frames_.end(), BeginsGroup);
     return next == frames_.end() ? nullptr : &*next;
 }

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The row of frames that players address: index and time, growth, spans.
+// The frames that players address: index and time, growth, spans.
 #include <random>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "test/support/footage/archive_folder.h"
@@ -19,7 +19,7 @@ using namespace archive;
 
 constexpr std::int64_t kFarFuture = 4'000'000'000'000;  // whoever waits for the clock waits long
 
-std::vector<std::int64_t> Times(const Recording& recording) {
+std::vector<std::int64_t> Times(const RecordingReader& recording) {
     std::vector<std::int64_t> times;
     for (int i = 0; i < recording.FrameCount(); ++i) {
         times.push_back(recording.At(i).time_ms);
@@ -43,7 +43,7 @@ std::vector<std::uint32_t> RandomTimes(std::mt19937& random) {
     return times;
 }
 
-void CheckRow(const Recording& recording) {
+void CheckRow(const RecordingReader& recording) {
     const std::vector<std::int64_t> times = Times(recording);
     const int count = recording.FrameCount();
     EXPECT_GE(recording.FrameRate(), 1);
@@ -68,14 +68,14 @@ void CheckRow(const Recording& recording) {
     }
 }
 
-TEST(Recording, LeadsFromIndexToTimeAndBackForAnyTimes) {
+TEST(RecordingReader, LeadsFromIndexToTimeAndBackForAnyTimes) {
     std::mt19937 random(7);
     for (int round = 0; round < 300; ++round) {
         const ArchiveFolder folder;
         std::vector<std::uint32_t> times = RandomTimes(random);
         FrameIndexWriter index = BeginRecording(folder / "a.mkv", kFarFuture);
         const std::vector<FrameEntry> frames = FramesAt(times);
-        Recording recording(folder / "a.mkv");
+        RecordingReader recording(folder / "a.mkv");
         std::vector<std::int64_t> offered;
         for (std::size_t done = 0; done < frames.size();) {
             const std::size_t step = std::min<std::size_t>(1 + random() % 30, frames.size() - done);
@@ -95,10 +95,10 @@ TEST(Recording, LeadsFromIndexToTimeAndBackForAnyTimes) {
         ASSERT_FALSE(recording.Grows());
         CheckRow(recording);
         if (std::is_sorted(times.begin(), times.end())) {
-            EXPECT_EQ(Times(recording), Times(Recording(folder / "a.mkv"))) << "growing and finished differ";
+            EXPECT_EQ(Times(recording), Times(RecordingReader(folder / "a.mkv"))) << "growing and finished differ";
         }
         // Without repeats, the row is the file's frames by time.
-        const Recording whole(folder / "a.mkv");
+        const RecordingReader whole(folder / "a.mkv");
         std::vector<std::uint32_t> shown;
         for (int i = 0; i < whole.FrameCount(); ++i) {
             if (i == 0 || whole.At(i).entry != whole.At(i - 1).entry) {
@@ -110,31 +110,31 @@ TEST(Recording, LeadsFromIndexToTimeAndBackForAnyTimes) {
     }
 }
 
-TEST(Recording, KeepsItsRateWithinBounds) {
+TEST(RecordingReader, KeepsItsRateWithinBounds) {
     const ArchiveFolder folder;
     const std::pair<std::vector<std::uint32_t>, double> rows[] = {
         {{0}, 1}, {{0, 40, 80}, 25}, {{0, 0, 0, 0}, 1000}, {{0, 10'000}, 1}, {{0, 33, 67, 100}, 30}};
     for (const auto& [times, rate] : rows) {
         std::filesystem::remove(folder / "a.index");
         MakeRecording(folder / "a.mkv", times);
-        EXPECT_NEAR(Recording(folder / "a.mkv").FrameRate(), rate, 0.01);
+        EXPECT_NEAR(RecordingReader(folder / "a.mkv").FrameRate(), rate, 0.01);
     }
     std::filesystem::remove(folder / "a.index");
     MakeRecording(folder / "a.mkv", {});
-    EXPECT_THROW(Recording(folder / "a.mkv").FrameRate(), ArchiveError);
+    EXPECT_THROW(RecordingReader(folder / "a.mkv").FrameRate(), ArchiveError);
 }
 
-TEST(Recording, MovesOnWhileASlowCameraSaysNothing) {
+TEST(RecordingReader, MovesOnWhileASlowCameraSaysNothing) {
     const ArchiveFolder folder;
     FrameIndexWriter index = BeginRecording(folder / "a.mkv", base::WallMillis() - 10'500);
     index.Append(FramesAt({0}));
-    const Recording recording(folder / "a.mkv");
+    const RecordingReader recording(folder / "a.mkv");
     EXPECT_GE(recording.FrameCount(), 7);
     EXPECT_LE(recording.FrameCount(), 10) << "ahead of what may still come";
 }
 
 // The wall clock of three recordings, the last after the clock was set back.
-TEST(Recording, JoinsTheRecordingsOfASpan) {
+TEST(RecordingReader, JoinsTheRecordingsOfASpan) {
     const ArchiveFolder folder;
     const std::string names[] = {"1970-01-01/000010-1.mkv", "1970-01-01/000012-2.mkv", "1970-01-01/000011-3.mkv"};
     MakeRecording(folder / names[0], {0, 500, 1000, 1500}, 10'000);
@@ -154,7 +154,7 @@ TEST(Recording, JoinsTheRecordingsOfASpan) {
     const std::filesystem::path path = folder / "1970-01-02/000000-4.span";
     for (const Row& row : rows) {
         WriteSpan(path, row.span);
-        const Recording recording(path);
+        const RecordingReader recording(path);
         EXPECT_FALSE(recording.Grows());
         EXPECT_EQ(Times(recording), row.times);
         for (int i = 0; i < recording.FrameCount(); ++i) {
@@ -162,17 +162,17 @@ TEST(Recording, JoinsTheRecordingsOfASpan) {
         }
     }
     WriteSpan(path, {1000, 2000, {"1970-01-01/000005-9.mkv"}});
-    EXPECT_THROW(Recording{path}, ArchiveError);
+    EXPECT_THROW(RecordingReader{path}, ArchiveError);
 }
 
-TEST(Recording, FollowsASpanIntoRecordingsThatAreMadeLater) {
+TEST(RecordingReader, FollowsASpanIntoRecordingsThatAreMadeLater) {
     const ArchiveFolder folder;
     const std::int64_t begin_ms = base::WallMillis() - 1000;
     const std::string names[] = {"1970-01-01/000010-1.mkv", "1970-01-01/000012-2.mkv"};
     const std::filesystem::path path = folder / "1970-01-01/000000-3.span";
     std::filesystem::create_directories(path.parent_path());
     WriteSpan(path, {begin_ms, begin_ms + 60'000, {}});
-    Recording recording(path);
+    RecordingReader recording(path);
     EXPECT_TRUE(recording.Grows());
     EXPECT_EQ(recording.FrameCount(), 0);
     FrameIndexWriter first = BeginRecording(folder / names[0], begin_ms);

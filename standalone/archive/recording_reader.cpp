@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/archive/recording.h"
+#include "standalone/archive/recording_reader.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -15,21 +15,22 @@
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
 namespace {
 
-constexpr std::int64_t kLongestFrameMs = 1000;
-// A frame is in the index that soon after it was recorded, or the disk is in trouble.
-constexpr std::int64_t kLatestMs = 3000;
-// H.264 and H.265 move no frame over more than this many others.
+constexpr std::int64_t kMaxFrameMs = 1000;
+// A frame is in the index within this time, unless the disk is in trouble.
+constexpr std::int64_t kMaxIndexDelayMs = 3000;
+// H.264 and H.265 reorder a frame across no more than this many others.
 constexpr std::size_t kMaxReordered = 16;
 
 }  // namespace
 
-// One file of the row, and its frames in the order of decoding.
-class Recording::Segment {
+// One file, and its frames in decoding order.
+class RecordingReader::Segment {
   public:
     Segment(std::filesystem::path path, std::optional<std::int64_t> base_ms)
         : path_(std::move(path)),
@@ -37,9 +38,10 @@ class Recording::Segment {
           index_(IndexPathOf(path_)),
           base_ms_(base_ms) {}
 
-    // Reads what was appended. Returns the entries that have their place in the order of showing for good.
+    // Reads what was appended. Returns the entries whose place in presentation order is final, in that order.
     std::vector<std::uint32_t> Refresh() {
-        grows_ = index_.IsGrowing();  // asked first, so that an end that comes between means one more look, not a loss
+        grows_ =
+            index_.IsGrowing();  // first, so that a writer that finishes in between causes another read, not a loss
         struct stat status {};
         if (::fstat(file_.Get(), &status) != 0) {
             base::ThrowErrno("cannot read " + path_.string());
@@ -78,7 +80,7 @@ class Recording::Segment {
     std::span<const FrameEntry> Entries() const { return entries_; }
     bool Grows() const { return grows_; }
     std::int64_t LatestWallMs() const { return Header().start_wall_ms + latest_ms_; }
-    // Where the segment's 0 ms is in the row.
+    // Where the segment's 0 ms is in the whole. Fixed by the first call.
     std::int64_t BaseMs(std::int64_t unless_known) {
         base_ms_ = base_ms_.value_or(unless_known);
         return *base_ms_;
@@ -102,7 +104,9 @@ class Recording::Segment {
     bool grows_ = false;
 };
 
-Recording::Recording(const std::filesystem::path& path) : path_(path), is_span_(path.extension() == ".span") {
+RecordingReader::RecordingReader(const std::filesystem::path& path)
+    : path_(path),
+      is_span_(path.extension() == ".span") {
     if (!is_span_) {
         segments_.push_back(std::make_unique<Segment>(path, 0));
         start_wall_ms_ = segments_.front()->Header().start_wall_ms;
@@ -113,14 +117,14 @@ Recording::Recording(const std::filesystem::path& path) : path_(path), is_span_(
     }
 }
 
-Recording::Recording(Recording&&) noexcept = default;
-Recording::~Recording() = default;
+RecordingReader::RecordingReader(RecordingReader&&) noexcept = default;
+RecordingReader::~RecordingReader() = default;
 
-void Recording::Refresh() {
+void RecordingReader::Refresh() {
     if (is_span_) {
         OpenSegments();
     }
-    // They end one after the other; what has ended is not looked at again.
+    // They finish one after the other; what has finished is not read again.
     for (; read_segments_ < segments_.size(); ++read_segments_) {
         Append(static_cast<std::uint32_t>(read_segments_));
         if (segments_[read_segments_]->Grows()) {
@@ -130,19 +134,20 @@ void Recording::Refresh() {
     const std::int64_t now_ms = base::WallMillis();
     const bool is_open = read_segments_ < segments_.size();
     if (is_span_) {
-        grows_ = is_open ? segments_[read_segments_]->LatestWallMs() < end_wall_ms_ : now_ms < end_wall_ms_ + kLatestMs;
+        grows_ = is_open ? segments_[read_segments_]->LatestWallMs() < end_wall_ms_
+                         : now_ms < end_wall_ms_ + kMaxIndexDelayMs;
     } else {
         grows_ = is_open;
     }
     if (grows_) {
-        const std::int64_t longest_ms = std::int64_t{kMaxRecordingSeconds} * 1000;
+        const std::int64_t max_ms = std::int64_t{base::kMaxRecordingSeconds} * 1000;
         const std::int64_t until_ms = is_span_ ? std::min(now_ms, end_wall_ms_) : now_ms;
-        RepeatLast(std::min(until_ms - start_wall_ms_ - kLatestMs, longest_ms));
+        RepeatLast(std::min(until_ms - start_wall_ms_ - kMaxIndexDelayMs, max_ms));
     }
 }
 
-// Opens the recordings that the span names by now and that are not known yet.
-void Recording::OpenSegments() {
+// Opens the recordings that were added to the span file.
+void RecordingReader::OpenSegments() {
     const Span span = ReadSpan(path_);
     start_wall_ms_ = span.begin_ms;
     end_wall_ms_ = span.end_ms;
@@ -158,10 +163,10 @@ void Recording::OpenSegments() {
     }
 }
 
-void Recording::Append(std::uint32_t number) {
+void RecordingReader::Append(std::uint32_t number) {
     Segment& segment = *segments_[number];
     const std::vector<std::uint32_t> entries = segment.Refresh();
-    // Recordings follow each other by the wall clock; when that was set back, the later one follows the earlier all the same.
+    // By the wall clock; when that was set back, the later recording still comes after the earlier one.
     const std::int64_t by_wall_ms = segment.Header().start_wall_ms - start_wall_ms_;
     const std::int64_t base_ms =
         segment.BaseMs(frames_.empty() ? by_wall_ms : std::max(by_wall_ms, frames_.back().time_ms + 1));
@@ -174,7 +179,7 @@ void Recording::Append(std::uint32_t number) {
     }
 }
 
-void Recording::Place(std::uint32_t segment, std::uint32_t entry, std::int64_t time_ms) {
+void RecordingReader::Place(std::uint32_t segment, std::uint32_t entry, std::int64_t time_ms) {
     if (!frames_.empty()) {
         RepeatLast(time_ms);
         time_ms = std::max(time_ms, frames_.back().time_ms + 1);
@@ -185,15 +190,15 @@ void Recording::Place(std::uint32_t segment, std::uint32_t entry, std::int64_t t
     frames_.push_back({segment, entry, time_ms});
 }
 
-void Recording::RepeatLast(std::int64_t before_ms) {
-    while (!frames_.empty() && before_ms - frames_.back().time_ms > kLongestFrameMs) {
+void RecordingReader::RepeatLast(std::int64_t before_ms) {
+    while (!frames_.empty() && before_ms - frames_.back().time_ms > kMaxFrameMs) {
         RecordedFrame again = frames_.back();
-        again.time_ms += kLongestFrameMs;
+        again.time_ms += kMaxFrameMs;
         frames_.push_back(again);
     }
 }
 
-double Recording::FrameRate() const {
+double RecordingReader::FrameRate() const {
     if (frames_.empty()) {
         throw ArchiveError(path_.string() + " has no frame yet");
     }
@@ -202,15 +207,15 @@ double Recording::FrameRate() const {
     return duration_ms == 0 ? 1.0 : std::clamp(periods * 1000.0 / static_cast<double>(duration_ms), 1.0, 1000.0);
 }
 
-std::int64_t Recording::PeriodMs() const {
+std::int64_t RecordingReader::PeriodMs() const {
     return std::max<std::int64_t>(std::llround(1000.0 / FrameRate()), 1);
 }
 
-bool Recording::Grows() const {
+bool RecordingReader::Grows() const {
     return grows_;
 }
 
-int Recording::IndexAt(std::int64_t time_ms) const {
+int RecordingReader::IndexAt(std::int64_t time_ms) const {
     if (time_ms < 0 || frames_.empty()) {
         return -1;
     }
@@ -225,7 +230,7 @@ int Recording::IndexAt(std::int64_t time_ms) const {
     return static_cast<int>(std::min<std::int64_t>(index + std::min<std::int64_t>(ahead, INT_MAX), INT_MAX));
 }
 
-std::int64_t Recording::TimeOf(int index) const {
+std::int64_t RecordingReader::TimeOf(int index) const {
     if (frames_.empty()) {
         return 0;
     }
@@ -236,19 +241,19 @@ std::int64_t Recording::TimeOf(int index) const {
     return frames_[static_cast<std::size_t>(std::max(index, 0))].time_ms;
 }
 
-const IndexHeader& Recording::Header(std::uint32_t segment) const {
+const IndexHeader& RecordingReader::Header(std::uint32_t segment) const {
     return segments_.at(segment)->Header();
 }
 
-std::span<const FrameEntry> Recording::Entries(std::uint32_t segment) const {
+std::span<const FrameEntry> RecordingReader::Entries(std::uint32_t segment) const {
     return segments_.at(segment)->Entries();
 }
 
-const std::filesystem::path& Recording::PathOf(std::uint32_t segment) const {
+const std::filesystem::path& RecordingReader::PathOf(std::uint32_t segment) const {
     return segments_.at(segment)->Path();
 }
 
-void Recording::ReadBytes(std::uint32_t segment, const FrameEntry& frame, std::span<std::uint8_t> buffer) const {
+void RecordingReader::ReadBytes(std::uint32_t segment, const FrameEntry& frame, std::span<std::uint8_t> buffer) const {
     segments_.at(segment)->ReadBytes(frame, buffer);
 }
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/maintenance/recording_state.h"
+#include "standalone/maintenance/recording_status.h"
 
 #include <algorithm>
 #include <array>
@@ -33,40 +33,40 @@ const char* NameOf(RecordingState state) {
     return std::ranges::find(kNames, state, &std::pair<RecordingState, const char*>::first)->second;
 }
 
-void WriteRecordingStates(const base::Installation& installation, const std::vector<CameraRecordingState>& states) {
+void WriteRecordingStatus(const base::Installation& installation, const std::vector<RecordingStatus>& cameras) {
     std::ostringstream text;
-    for (const CameraRecordingState& each : states) {
+    for (const RecordingStatus& each : cameras) {
         std::string name = each.camera_name;
         std::ranges::replace(name, '\n', ' ');
-        text << each.camera << ' ' << NameOf(each.state) << ' ' << each.event << ' ' << each.lost_frames << ' ' << name
-             << '\n';
+        text << each.camera << ' ' << NameOf(each.state) << ' ' << each.event << ' ' << each.dropped_frames << ' '
+             << name << '\n';
     }
     base::WriteFileAtomically(PathOf(installation), text.str());
 }
 
-std::vector<CameraRecordingState> ReadRecordingStates(const base::Installation& installation) {
-    std::vector<CameraRecordingState> states;
+std::vector<RecordingStatus> ReadRecordingStatus(const base::Installation& installation) {
+    std::vector<RecordingStatus> cameras;
     std::error_code ignored;
     if (!std::filesystem::exists(PathOf(installation), ignored)) {
-        return states;
+        return cameras;
     }
     std::istringstream text(base::ReadFile(PathOf(installation)));
     for (std::string line; std::getline(text, line);) {
         std::istringstream fields(line);
-        CameraRecordingState each;
+        RecordingStatus each;
         std::string state;
-        if (!(fields >> each.camera >> state >> each.event >> each.lost_frames)) {
+        if (!(fields >> each.camera >> state >> each.event >> each.dropped_frames)) {
             continue;
         }
         std::getline(fields >> std::ws, each.camera_name);
         for (const auto& [value, name] : kNames) {
             if (state == name) {
                 each.state = value;
-                states.push_back(each);
+                cameras.push_back(each);
             }
         }
     }
-    return states;
+    return cameras;
 }
 
 }  // namespace lookhaven::maintenance

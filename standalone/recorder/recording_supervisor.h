@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recordings of all cameras, and the upkeep of what they leave on the mounts.
+// Starts and stops the recording of every camera, and runs the maintenance of the mounts in a thread of its own.
 //
-// Thread safety One thread; nothing here waits for a disk or the store.
+// Thread safety One thread; no call waits for a disk or the store.
 #pragma once
 
 #include <atomic>
@@ -14,21 +14,21 @@
 
 namespace lookhaven::recorder {
 
-class Recordings {
+class RecordingSupervisor {
   public:
     // The installation must outlive this object. Throws std::system_error.
-    Recordings(const base::Installation& installation, std::chrono::milliseconds no_data_limit);
+    RecordingSupervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit);
 
-    // Starts, changes and stops recordings as the catalog and the marks ask for.
+    // Starts, changes and stops workers to match the catalog and the pending marks.
     void Reconcile(const CatalogContents& catalog);
     void DoEverySecond();
 
     // The streams that must run to be recorded.
     std::vector<control::LiveStream> Wanted() const;
-    // Where the stream's frames go; null when it is not recorded.
+    // Where to push the stream's frames; null when it is not recorded.
     std::shared_ptr<FrameQueue> QueueOf(control::LiveStream stream) const;
 
-    // Asks all threads to end. Rows are stored after the last event is closed, so ask HasEnded until it is true.
+    // Asks all threads to end. Rows are stored after the last event is closed, so poll HasEnded until it is true.
     void RequestStop();
     bool HasEnded();
 
@@ -36,23 +36,23 @@ class Recordings {
     struct Entry {
         control::LiveStream stream;
         std::unique_ptr<RecordingWorker> worker;
-        bool ends = false;
+        bool is_ending = false;
     };
 
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
     void AnswerFlushes();
-    void Care(store::Store& store);
+    void Maintain(store::Store& store);
 
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
-    EventLedger ledger_;
-    std::atomic<bool> room_wanted_ = true;
-    bool recovered_ = false;              // the caretaker's alone
+    EventRowQueue rows_;
+    std::atomic<bool> needs_space_ = true;
+    bool recovered_ = false;              // only the maintenance thread uses it
     std::int64_t next_retention_us_ = 0;  // likewise
-    StoreThread caretaker_;
+    StoreThread maintenance_;
     std::map<int, Entry> entries_;
-    std::vector<maintenance::CameraRecordingState> published_;
+    std::vector<maintenance::RecordingStatus> published_;
     bool stores_last_rows_ = false;
 };
 

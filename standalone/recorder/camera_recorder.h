@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Decides for one camera what is recorded: where an event begins, where it is split, when recording pauses.
+//
+// Invariants    (1) Every event begins with a key frame and is split before one. Only the end of the request, a lost
+//               camera and a failing disk end it elsewhere.
+//               (2) Times within an event come from the monotonic clock. A step of the wall clock by more than
+//               kClockStepMs ends the event, so that no event's times are wrong by more.
+//               (3) Nothing here throws: trouble with a mount is a state, and recording resumes by itself.
+// Thread safety One thread.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+
+#include "standalone/maintenance/recording_status.h"
+#include "standalone/recorder/catalog.h"
+#include "standalone/recorder/event_writer.h"
+#include "standalone/recorder/pre_record_buffer.h"
+
+namespace lookhaven::recorder {
+
+constexpr std::int64_t kClockStepMs = 2'000;
+
+// What the recorders of all cameras share. Borrowed: everything in it outlives them.
+struct RecorderContext {
+    EventRowQueue& rows;
+    std::function<std::int64_t()> monotonic_us;
+    std::function<std::int64_t()> wall_ms;
+    std::function<void()> need_space;  // called when a disk is full, so that retention runs soon
+    std::int64_t no_data_limit_us = 10'000'000;
+};
+
+// What is to be recorded of one camera.
+struct RecordingRequest {
+    CameraPlan plan;
+    std::int64_t marks_until_s = 0;  // wall clock; a mark needs footage until then
+};
+
+class CameraRecorder {
+  public:
+    CameraRecorder(int camera, RecorderContext context);
+    // Closes the open event.
+    ~CameraRecorder();
+
+    void SetRequest(const RecordingRequest& request) { request_ = request; }
+
+    // The camera's next frame, in the order in which the camera sent them. May wait for the disk.
+    void Take(Frame frame);
+    // Call at least twice a second, whether frames come or not.
+    void Tick();
+    // Writes everything taken so far to the disk. False when that event is not the open one, or the disk fails.
+    bool Flush(int event);
+    void Close();
+
+    maintenance::RecordingState State() const { return state_; }
+    int OpenEvent() const { return event_ ? event_->Start().id : 0; }
+
+  private:
+    std::int64_t WallS() const { return context_.wall_ms() / 1000; }
+    std::int64_t WallOf(std::int64_t timestamp_us) const;
+    bool IsWanted() const;
+    int Reason() const;
+    bool MustEndBefore(const Frame& frame) const;
+    bool IsOverdue(std::int64_t length_us) const;
+    void Begin();
+    std::optional<EventStart> Prepare(std::int64_t first_us);
+    void CheckMount();
+    template <class Work>
+    bool Guard(Work&& work);
+    void Pause(maintenance::RecordingState state, const std::string& reason);
+
+    const int camera_;
+    const RecorderContext context_;
+    RecordingRequest request_;
+    PreRecordBuffer pre_record_;  // used while no event is open
+    std::optional<EventWriter> event_;
+    maintenance::RecordingState state_ = maintenance::RecordingState::kReady;
+    std::int64_t last_picture_us_ = 0;
+    std::int64_t last_flush_us_ = 0;
+    std::int64_t next_mount_check_us_ = 0;
+    std::int64_t try_again_us_ = 0;
+};
+
+}  // namespace lookhaven::recorder
