@@ -126,7 +126,7 @@ bool MountFolder::Remove(const archive::FileName& name) const {
     for (const archive::FileName& each : day ? WithIndex(name) : std::vector<archive::FileName>()) {
         if (::unlinkat(day.Get(), FileNameOf(each).c_str(), 0) == 0) {
             removed = true;
-        } else if (errno != ENOENT) {
+        } else if (errno != ENOENT && each.kind == name.kind) {
             base::ThrowErrno("cannot remove " + (path_ / archive::PathOf(each)).string());
         }
     }

@@ -46,8 +46,9 @@ class MountFolder {
     bool HasDay(int camera, std::int64_t second) const { return static_cast<bool>(OpenDay(camera, second)); }
     // Whether it exists, as a regular file.
     bool Has(const archive::FileName& name) const;
-    // Removes the file, and a recording's index with it. False when neither existed. Throws std::system_error; then the
-    // recording may be gone already and its index not.
+    // Removes the file, and a recording's index with it. False when neither existed. Throws std::system_error when the
+    // file cannot be removed; it is still there then. An index that cannot be removed stays behind, and verify finds
+    // it.
     bool Remove(const archive::FileName& name) const;
     // Renames a recording and its index to another event's id. False when that name is taken. Throws std::system_error.
     bool Renumber(const archive::FileName& name, int event) const;

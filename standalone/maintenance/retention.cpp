@@ -73,11 +73,20 @@ class Retention {
             base::LogWarning("the path of event " + std::to_string(event.id) + " names no recording: left alone");
             return;
         }
-        folder_.Remove(*name);
+        RemoveFileOrRestoreRow(event, *name);
         RemoveMarks(event);
         ClearRecordingLog(event);
         if (archive::DayOf(event.start_s) < archive::DayOf(now_s_)) {
             folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
+        }
+    }
+
+    void RemoveFileOrRestoreRow(const store::Event& event, const archive::FileName& name) {
+        try {
+            folder_.Remove(name);
+        } catch (const std::system_error&) {
+            events_.Begin(event);
+            throw;
         }
     }
 

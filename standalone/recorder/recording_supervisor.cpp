@@ -17,16 +17,6 @@ namespace {
 
 constexpr std::int64_t kRetentionUs = 10'000'000;
 
-// A mount without any events gets its marker file; one that has events but no marker is an unplugged disk.
-void MarkNewMounts(store::Store& store) {
-    for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (mount.enabled && maintenance::MountFolder::HasNoMarker(mount.path) &&
-            store::Events(store).Content(mount.id).events == 0) {
-            maintenance::MountFolder::WriteMarker(mount.path, mount.id);
-        }
-    }
-}
-
 }  // namespace
 
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
@@ -113,7 +103,7 @@ void RecordingSupervisor::DoEverySecond() {
     }
 }
 
-std::vector<control::LiveStream> RecordingSupervisor::Wanted() const {
+std::vector<control::LiveStream> RecordingSupervisor::NeededStreams() const {
     std::vector<control::LiveStream> streams;
     for (const auto& [camera, entry] : entries_) {
         if (!entry.is_ending) {
@@ -160,11 +150,45 @@ void RecordingSupervisor::Maintain(store::Store& store) {
         return;
     }
     next_retention_us_ = now_us + kRetentionUs;
+    DeleteOld(store, now_s);
+}
+
+// A mount without any events gets its marker file; one that has events but no marker is an unplugged disk.
+void RecordingSupervisor::MarkNewMounts(store::Store& store) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (const maintenance::RetentionResult removed = maintenance::EnforceRetention(store, mount, now_s);
-            removed.events > 0) {
-            base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(removed.events) +
-                          " old events");
+        TryOn(mount, "mark", [&] {
+            if (mount.enabled && maintenance::MountFolder::HasNoMarker(mount.path) &&
+                store::Events(store).Content(mount.id).events == 0) {
+                maintenance::MountFolder::WriteMarker(mount.path, mount.id);
+            }
+        });
+    }
+}
+
+void RecordingSupervisor::DeleteOld(store::Store& store, std::int64_t now_s) {
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        TryOn(mount, "delete old events of", [&] {
+            const maintenance::RetentionResult deleted = maintenance::EnforceRetention(store, mount, now_s);
+            if (deleted.events > 0) {
+                base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
+                              " old events");
+            }
+        });
+    }
+}
+
+// Trouble with one mount must not keep the others from being maintained. Logged once for each reason.
+template <class Work>
+void RecordingSupervisor::TryOn(const store::Mount& mount, const std::string& purpose, Work&& work) {
+    const std::string what = purpose + " mount " + std::to_string(mount.id);
+    try {
+        work();
+        reported_failures_.erase(what);
+    } catch (const store::StoreError&) {
+        throw;
+    } catch (const std::exception& failure) {
+        if (std::exchange(reported_failures_[what], failure.what()) != failure.what()) {
+            base::LogWarning("cannot " + what + ": " + failure.what());
         }
     }
 }

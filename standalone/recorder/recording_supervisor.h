@@ -8,6 +8,7 @@
 #include <atomic>
 #include <map>
 #include <memory>
+#include <string>
 #include <vector>
 
 #include "standalone/recorder/recording_worker.h"
@@ -23,8 +24,8 @@ class RecordingSupervisor {
     void Reconcile(const CatalogContents& catalog);
     void DoEverySecond();
 
-    // The streams that must run to be recorded.
-    std::vector<control::LiveStream> Wanted() const;
+    // The streams that must run because they are recorded.
+    std::vector<control::LiveStream> NeededStreams() const;
     // Where to push the stream's frames; null when it is not recorded.
     std::shared_ptr<FrameQueue> QueueOf(control::LiveStream stream) const;
 
@@ -42,14 +43,19 @@ class RecordingSupervisor {
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
     void AnswerFlushes();
     void Maintain(store::Store& store);
+    void MarkNewMounts(store::Store& store);
+    void DeleteOld(store::Store& store, std::int64_t now_s);
+    template <class Work>
+    void TryOn(const store::Mount& mount, const std::string& purpose, Work&& work);
 
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
     EventRowQueue rows_;
     std::atomic<bool> needs_space_ = true;
-    bool recovered_ = false;              // only the maintenance thread uses it
-    std::int64_t next_retention_us_ = 0;  // likewise
+    bool recovered_ = false;                                // only the maintenance thread uses it
+    std::int64_t next_retention_us_ = 0;                    // likewise
+    std::map<std::string, std::string> reported_failures_;  // likewise; by purpose
     StoreThread maintenance_;
     std::map<int, Entry> entries_;
     std::vector<maintenance::RecordingStatus> published_;

@@ -83,11 +83,11 @@ void Supervisor::DoEverySecond() {
 void Supervisor::Reconcile() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     recordings_.Reconcile(*catalog);
-    std::vector<control::LiveStream> wanted = demand_.ActiveStreams(base::MonotonicMicros());
-    const std::vector<control::LiveStream> recorded = recordings_.Wanted();
-    wanted.insert(wanted.end(), recorded.begin(), recorded.end());
+    std::vector<control::LiveStream> needed = demand_.ActiveStreams(base::MonotonicMicros());
+    const std::vector<control::LiveStream> recorded = recordings_.NeededStreams();
+    needed.insert(needed.end(), recorded.begin(), recorded.end());
     std::map<control::LiveStream, StreamPlan> plans;
-    for (const control::LiveStream& stream : wanted) {
+    for (const control::LiveStream& stream : needed) {
         if (const auto plan = catalog->streams.find(stream); plan != catalog->streams.end()) {
             plans.insert(*plan);
         }

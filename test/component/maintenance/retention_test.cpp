@@ -123,6 +123,19 @@ TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
     }
 }
 
+TEST_F(RetentionTest, AnEventWhoseFileCannotBeRemovedKeepsItsRow) {
+    const int stuck = footage_.Record(1, kNoon, 60);
+    const int next = footage_.Record(1, kNoon + 60, 60);
+    const fs::path file = footage_.FileOf(stuck);
+    fs::remove(file);
+    fs::create_directory(file);
+    EXPECT_THROW(Run(1), std::system_error);
+    EXPECT_THAT(Left(), ElementsAre(stuck, next));
+    EXPECT_EQ(footage_.FileOf(stuck), file);
+    fs::remove(file);
+    EXPECT_EQ(Run(1).events, 2);
+}
+
 TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
     const int first = footage_.Record(1, kNoon, 60);
     footage_.Record(1, kNoon + 60, 60);

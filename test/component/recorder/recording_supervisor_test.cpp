@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Maintenance of several mounts, one of which fails.
+#include "standalone/recorder/recording_supervisor.h"
+
+#include <gtest/gtest.h>
+
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/store/mounts.h"
+#include "test/support/footage/archive_folder.h"
+
+namespace lookhaven::recorder {
+namespace {
+
+TEST(RecordingSupervisor, MaintainsTheMountsBesideOneThatFails) {
+    const test::ArchiveFolder home;
+    base::Installation::CreateFolders(home.Path());
+    const base::Installation installation(home.Path());
+    store::Store::Migrate(installation.StoreUrl());
+    store::Store store = store::Store::Open(installation.StoreUrl());
+    std::filesystem::create_directory(home / "disk");
+    int id = 0;
+    // Nobody can create a file in /proc.
+    for (const std::filesystem::path& folder : {std::filesystem::path("/proc"), home / "disk"}) {
+        store::Mount mount;
+        mount.name = folder.filename();
+        mount.path = folder;
+        id = store::Mounts(store).Add(mount);
+    }
+    RecordingSupervisor supervisor(installation, std::chrono::seconds(1));
+    for (int tries = 0; tries < 3000 && !maintenance::MountFolder::Open(home / "disk", id); ++tries) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    EXPECT_TRUE(maintenance::MountFolder::Open(home / "disk", id)) << "it was not given its marker";
+    supervisor.RequestStop();
+    while (!supervisor.HasEnded()) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+}
+
+}  // namespace
+}  // namespace lookhaven::recorder
