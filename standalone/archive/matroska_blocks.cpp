@@ -15,7 +15,7 @@ namespace lookhaven::archive {
 
 namespace {
 
-// Element ids, with their length marker as they stand in the file.
+// Element ids, including their length marker, as in the file.
 constexpr std::uint32_t kEbml = 0x1A45DFA3;
 constexpr std::uint32_t kSegment = 0x18538067;
 constexpr std::uint32_t kSeekHead = 0x114D9B74;
@@ -129,7 +129,7 @@ std::span<const std::uint8_t> MatroskaBlocks::Bytes(std::uint64_t at, std::size_
     return rest.first(std::min(count, rest.size()));
 }
 
-// The element whose head stands at the place, wherever it may end.
+// The element whose header begins at the position, even if it does not end inside the file.
 std::optional<MatroskaBlocks::Element> MatroskaBlocks::ReadElementHead(std::uint64_t at) {
     const std::span<const std::uint8_t> head = Bytes(at, 12);
     const auto id = ParseNumber(head, 4);
@@ -141,7 +141,7 @@ std::optional<MatroskaBlocks::Element> MatroskaBlocks::ReadElementHead(std::uint
     return Element{static_cast<std::uint32_t>(id->with_marker), data, data + size->value, size->IsUnknown()};
 }
 
-// The element that begins at the place, when it lies wholly before the end.
+// The element that begins at the position, if all of it is before the end.
 std::optional<MatroskaBlocks::Element> MatroskaBlocks::ReadElement(std::uint64_t at, std::uint64_t end) {
     const std::optional<Element> element = at < end ? ReadElementHead(at) : std::nullopt;
     return element && !element->is_endless && element->end <= end ? element : std::nullopt;

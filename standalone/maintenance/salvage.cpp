@@ -19,8 +19,8 @@ std::int64_t EndOf(std::int64_t start_s, std::int64_t duration_ms) {
     return start_s + seconds;
 }
 
-// Empty, or a head of ours without a frame: no other program leaves such a file.
-bool HasOurHeadOnly(const std::filesystem::path& recording) {
+// Empty, or headers in our format without a frame: no other program leaves such a file.
+bool HasNoFrame(const std::filesystem::path& recording) {
     if (std::filesystem::file_size(recording) == 0) {
         return true;
     }
@@ -37,7 +37,7 @@ bool HasOurHeadOnly(const std::filesystem::path& recording) {
 // Removes a file without a frame if it is certainly ours.
 std::string Discard(const MountFolder& mount, const archive::FileName& name) {
     const std::string path = (mount.Path() / archive::PathOf(name)).string();
-    if (!HasOurHeadOnly(path)) {
+    if (!HasNoFrame(path)) {
         return "left " + path + " alone: it holds no recording of ours";
     }
     mount.Remove(name);
@@ -70,7 +70,7 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
     const std::optional<archive::FileName> name = archive::ParsePath(row.path);
     if (!name || !mount.Has(*name)) {
         events.Remove(std::array{row.id});
-        return "removed event " + std::to_string(row.id) + ", whose file " + path.string() + " is gone";
+        return "removed event " + std::to_string(row.id) + ", whose file " + path.string() + " is missing";
     }
     const archive::Contents contents = archive::CloseCrashed(path);
     if (contents.frame_count == 0) {
@@ -96,7 +96,7 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
         }
     }
     events.Begin(RowOf(kept, mount_id, contents));
-    return "took in " + (mount.Path() / archive::PathOf(kept)).string();
+    return "adopted " + (mount.Path() / archive::PathOf(kept)).string();
 }
 
 }  // namespace lookhaven::maintenance

@@ -80,7 +80,7 @@ Inspection Inspect(const std::filesystem::path& path) {
     result.is_damaged_inside = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());
     result.must_rebuild_index = !result.is_damaged_inside;
     if (result.problem.empty()) {
-        result.problem = result.is_damaged_inside ? "the recording " + path.string() + " is damaged behind frame " +
+        result.problem = result.is_damaged_inside ? "the recording " + path.string() + " is damaged after frame " +
                                                         std::to_string(found.size())
                                                   : "the index of " + path.string() + " does not name its frames";
     }

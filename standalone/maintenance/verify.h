@@ -29,8 +29,8 @@ struct VerifyReport {
 };
 
 // Reads the head of every frame: about a second for five hours of recordings. progress, when given, is called with the
-// number of events done and of all events, counted anew for each mount. Throws store::StoreError; trouble with one file
-// is reported as a fault.
+// number of events done and of all events, counted separately for each mount. Throws store::StoreError; trouble with
+// one file is reported as a fault.
 VerifyReport Verify(store::Store& store, bool repair,
                     const std::function<void(std::size_t, std::size_t)>& progress = {});
 

@@ -10,7 +10,7 @@ namespace {
 
 constexpr std::array<std::uint8_t, 4> kStartCode{0, 0, 0, 1};
 
-// The position just behind the next start code, or the frame's size.
+// The position just after the next start code, or the frame's size.
 std::size_t AfterStartCode(std::span<const std::uint8_t> frame, std::size_t from) {
     for (std::size_t i = from; i + 3 <= frame.size(); ++i) {
         if (frame[i] == 0 && frame[i + 1] == 0 && frame[i + 2] == 1) {
@@ -65,7 +65,7 @@ bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame) {
 bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece) {
     const std::size_t at = AfterStartCode(piece, 0);
     const std::size_t head_bytes = codec == Codec::kH264 ? 1 : 2;
-    // A later fragment of a unit has no start code in front; one by chance deeper inside means nothing.
+    // A later fragment of a unit does not begin with a start code; one found further inside is a coincidence.
     if (at > kStartCode.size() || at + head_bytes >= piece.size()) {
         return false;
     }
@@ -87,7 +87,7 @@ std::span<const std::uint8_t> ParameterSets::Complete(std::span<const std::uint8
     return completed_;
 }
 
-// Sets stand in front of the picture, so the search ends there; without both kinds it comes to nothing.
+// Parameter sets precede the picture, so the search ends there. Empty unless the frame has both kinds.
 std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> frame) const {
     std::vector<std::uint8_t> sets;
     bool has_sequence_set = false;
@@ -101,7 +101,7 @@ std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> fr
         if (unit != Unit::kOther) {
             std::size_t end = next == frame.size() ? next : next - 3;
             while (end > begin && frame[end - 1] == 0) {
-                --end;  // a longer start code's zeros belong to nobody
+                --end;  // the extra zeros of a longer start code belong to no unit
             }
             const auto set = frame.subspan(begin, end - begin);
             if (std::search(sets.begin(), sets.end(), set.begin(), set.end()) == sets.end()) {

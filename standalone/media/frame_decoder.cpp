@@ -21,7 +21,7 @@ std::size_t LengthAt(std::span<const std::uint8_t> frame, std::size_t at) {
            frame[at + 3];
 }
 
-// The frame is a row of units behind their lengths, as containers have it, and nothing else.
+// Whether the frame consists of NAL units that each follow their length, as in containers.
 bool HasLengths(std::span<const std::uint8_t> frame) {
     std::size_t at = 0;
     while (frame.size() - at >= kLengthBytes) {
@@ -71,12 +71,12 @@ class AvFrameDecoder : public FrameDecoder {
 
     std::optional<std::int64_t> Take() override {
         int result = AVERROR_INVALIDDATA;
-        // What another thread could not decode is told here, once for each frame.
+        // Failures of the other threads are reported here, once for each frame.
         for (int i = 0; i <= context_->thread_count && result == AVERROR_INVALIDDATA; ++i) {
             result = avcodec_receive_frame(context_.get(), next_.get());
         }
         if (result < 0) {
-            return std::nullopt;  // and the picture that was taken last stays
+            return std::nullopt;  // the picture that was taken last stays valid
         }
         std::swap(frame_, next_);
         return frame_->pts;

@@ -14,7 +14,7 @@ std::optional<PictureSize> JpegSize(std::span<const std::uint8_t> jpeg) {
             ++at;  // a fill byte
             continue;
         }
-        // A frame header is any of SOF0 … SOF15 but for the three numbers that mean tables.
+        // A frame header is any of SOF0 … SOF15, except three numbers that mean tables.
         if (marker >= 0xc0 && marker <= 0xcf && marker != 0xc4 && marker != 0xc8 && marker != 0xcc) {
             const PictureSize size{word(at + 7), word(at + 5)};
             return size.IsUsable() ? std::optional(size) : std::nullopt;

@@ -21,7 +21,7 @@ namespace {
 constexpr int kQuality = 85;
 constexpr int kFractionBits = 14;
 
-// A colour space by what red and blue weigh in the brightness.
+// A colour space, as the weights of red and blue in luma.
 struct Weights {
     double red = 0.299;
     double blue = 0.114;
@@ -45,7 +45,8 @@ Weights WeightsOf(AVColorSpace space) {
     }
 }
 
-// How a frame's samples become JPEG's, as numbers with kFractionBits of fraction; colours count from their middle.
+// The conversion of a frame's samples to JPEG's, in fixed point with kFractionBits; chroma counts from its middle
+// value.
 struct Conversion {
     std::int32_t y_of_y = 0;
     std::int32_t y_base = 0;
@@ -68,7 +69,7 @@ Conversion ConversionOf(const AVFrame& frame) {
     conversion.y_base = fixed((is_full ? 0 : -16 * y_scale) + 0.5);
     conversion.is_identity = is_full && from.red == kJpegWeights.red && from.blue == kJpegWeights.blue;
     for (std::size_t i = 0; i < 2; ++i) {
-        // The colour of one unit of blueness, or of redness, without brightness.
+        // One unit of blue or red difference, at constant luma.
         const double blue = i == 0 ? 2 * (1 - from.blue) : 0;
         const double red = i == 1 ? 2 * (1 - from.red) : 0;
         const double green = -(from.red * red + from.blue * blue) / from.Green();
@@ -109,7 +110,7 @@ JpegEncoder::Planes JpegEncoder::OwnPlanes(int width, int height) {
     return {{begin, begin + y_bytes, begin + y_bytes + colour_bytes}, {width, colour_width, colour_width}};
 }
 
-// Of a frame with eight bits a sample and one colour for four pixels, as nearly every camera sends it.
+// For 8-bit 4:2:0 frames, which nearly every camera sends.
 JpegEncoder::Planes JpegEncoder::ConvertColours(const AVFrame& frame) {
     const Conversion with = ConversionOf(frame);
     if (with.is_identity) {
@@ -150,7 +151,7 @@ JpegEncoder::Planes JpegEncoder::ConvertColours(const AVFrame& frame) {
     return to;
 }
 
-// Of any other frame, by libswscale.
+// For any other frame, with libswscale.
 JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame) {
     scaler_.reset(sws_getContext(frame.width, frame.height, static_cast<AVPixelFormat>(frame.format), frame.width,
                                  frame.height, AV_PIX_FMT_YUVJ420P, SWS_BILINEAR | SWS_ACCURATE_RND, nullptr, nullptr,
@@ -173,7 +174,7 @@ JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame) {
 std::span<const std::uint8_t> JpegEncoder::Encode(const AVFrame& frame) {
     const bool is_usual = frame.format == AV_PIX_FMT_YUV420P || frame.format == AV_PIX_FMT_YUVJ420P;
     Planes planes = is_usual ? ConvertColours(frame) : ConvertLayout(frame);
-    // The compressor takes the buffer for so large, whatever is said.
+    // The compressor assumes a buffer of this size, whatever size it is told.
     const std::size_t needed = tjBufSize(frame.width, frame.height, TJSAMP_420);
     if (needed > jpeg_bytes_) {
         jpeg_ = std::make_unique_for_overwrite<std::uint8_t[]>(needed);

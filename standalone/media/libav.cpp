@@ -18,7 +18,7 @@ namespace lookhaven::media {
 
 namespace {
 
-// Twice the samples of a plane, for what stands around them.
+// Twice the samples of a plane, because of padding.
 constexpr std::size_t kMaxBlockBytes = std::size_t{2} * base::kMaxSidePixels * base::kMaxSidePixels;
 
 void WriteAvLog(void* object, int level, const char* format, va_list arguments) {

@@ -45,7 +45,7 @@ AVCodecID AvCodecOf(Codec codec) {
     return AV_CODEC_ID_NONE;
 }
 
-// What a container says of Opus where a network stream says nothing: channels, and 80 ms that decoders leave out.
+// The header that containers need for Opus and network streams lack: channels, and 80 ms that decoders skip.
 std::vector<std::uint8_t> OpusHead(const StreamFormat& format) {
     std::vector<std::uint8_t> head{'O', 'p', 'u', 's', 'H',
                                    'e', 'a', 'd', 1,   static_cast<std::uint8_t>(format.channels)};
@@ -167,7 +167,8 @@ void MatroskaOutput::Begin() {
 }
 
 void MatroskaOutput::Write(int stream, std::span<const std::uint8_t> data, std::int64_t time_ms, bool key_frame) {
-    // The muxer wants times of decoding that never fall and are no later than those of showing; it does not store them.
+    // The muxer requires decoding times that never decrease and are not after presentation times; it stores none of
+    // them.
     std::int64_t& decode_ms = decode_ms_.at(static_cast<std::size_t>(stream));
     decode_ms = std::max(decode_ms, time_ms - kMaxReorderingMs);
     packet_->data = const_cast<std::uint8_t*>(data.data());

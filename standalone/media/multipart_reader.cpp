@@ -40,7 +40,7 @@ std::string BoundaryOf(std::string_view content_type) {
 }
 
 MultipartReader::MultipartReader(std::string boundary, std::size_t max_part_bytes, Input input)
-    // Some cameras name the boundary with the dashes that belong to the delimiter.
+    // Some cameras include the delimiter's dashes in the boundary's name.
     : delimiter_(boundary.starts_with("--") ? std::move(boundary) : "--" + boundary),
       max_part_bytes_(max_part_bytes),
       input_(std::move(input)),
@@ -95,7 +95,7 @@ void MultipartReader::SkipToBoundary() {
             return;
         }
         if (line == "--" + delimiter_) {
-            delimiter_ = std::move(line);  // the dashes belonged to the boundary's name after all
+            delimiter_ = std::move(line);  // the dashes were part of the boundary's name
             return;
         }
         if (line == delimiter_ + "--") {
@@ -105,8 +105,8 @@ void MultipartReader::SkipToBoundary() {
     throw SourceError("sends no multipart answer");
 }
 
-// The part's length, or 0 when its head does not say it. Some cameras send blank lines before the head; a part that has
-// no head goes on with a picture, which begins with no letter.
+// The part's length, or 0 when its headers do not give it. Some cameras send blank lines before the headers. A part
+// without headers begins with its picture, and no picture begins with a letter.
 std::size_t MultipartReader::ReadHead() {
     constexpr std::string_view kLength = "content-length:";
     std::size_t size = 0;
@@ -125,7 +125,7 @@ std::size_t MultipartReader::ReadHead() {
     throw SourceError("sends a multipart head without an end");
 }
 
-// False when the part is too large; it is read past then.
+// False when the part is too large; it is skipped then.
 bool MultipartReader::ReadSized(std::size_t size) {
     const bool fits = size <= max_part_bytes_;
     part_.resize(fits ? size : 0);
@@ -161,7 +161,7 @@ bool MultipartReader::ReadToBoundary() {
             break;
         }
         if (part_.size() > max_part_bytes_ + tail) {
-            // Too large: keep only what a boundary may begin with.
+            // Too large: keep only what may be the beginning of a boundary.
             part_.erase(part_.begin(), part_.end() - static_cast<std::ptrdiff_t>(tail));
             fits = false;
         }

@@ -9,7 +9,7 @@ namespace lookhaven::media {
 
 namespace {
 
-// One decodes the next picture while the other codes this one.
+// One decodes the next picture while the other encodes this one.
 constexpr int kThreads = 2;
 
 }  // namespace
@@ -37,10 +37,11 @@ std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
     return decoder_->Encode(buffer);
 }
 
-// Leaves the decoder where the entry is still ahead, as near as can be.
+// Positions the decoder at or before the entry, as close to it as possible.
 void PictureReader::Seek(std::uint32_t segment, std::uint32_t entry) {
     const std::span<const archive::FrameEntry> entries = recording_.Entries(segment);
-    // Pictures may follow a key frame in the file and yet be shown, and depend on frames, before it.
+    // Pictures may follow a key frame in decoding order but precede it in presentation order, and depend on frames
+    // before it.
     std::uint32_t key = entry;
     while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[entry].time_ms)) {
         --key;
@@ -56,7 +57,7 @@ void PictureReader::Seek(std::uint32_t segment, std::uint32_t entry) {
     }
 }
 
-// Feeds frames until the entry's picture comes, or the one that is shown next when it cannot be decoded.
+// Feeds frames until the entry's picture comes out, or the next in presentation order when it cannot be decoded.
 void PictureReader::Decode(std::uint32_t entry) {
     const std::span<const archive::FrameEntry> entries = recording_.Entries(segment_);
     for (;;) {
@@ -76,7 +77,7 @@ void PictureReader::Decode(std::uint32_t entry) {
             decoder_->Feed(bytes_, next_++);
         } else {
             decoder_->Feed({}, 0);
-            is_inside_ = false;  // what it holds comes out; then it needs a new beginning
+            is_inside_ = false;  // drained: the decoder must be restarted
         }
     }
 }

@@ -20,7 +20,7 @@ namespace {
 
 constexpr std::int64_t kFlushMs = 1000;
 
-// What of one recording is copied; times from its own start.
+// The part of one recording that is copied; times from its own start.
 struct Piece {
     std::filesystem::path path;
     archive::IndexHeader header;
@@ -28,7 +28,7 @@ struct Piece {
     std::int64_t last_ms = 0;   // of the last frame
 };
 
-// Nothing when no frame of the recording is in the stretch of time.
+// Nothing when the recording has no frame in the period.
 std::optional<Piece> PieceOf(const std::filesystem::path& path, std::optional<std::int64_t> begin_wall_ms,
                              std::optional<std::int64_t> end_wall_ms) {
     archive::FrameIndexReader index(archive::IndexPathOf(path));
@@ -63,7 +63,7 @@ std::vector<Piece> PiecesOf(const std::filesystem::path& recording, const Export
         for (const std::string& name : span.recordings) {
             const std::filesystem::path path = recording.parent_path().parent_path() / name;
             if (!std::filesystem::exists(path)) {
-                continue;  // retention took it
+                continue;  // deleted by retention
             }
             if (auto piece = PieceOf(path, begin_ms, end_ms)) {
                 pieces.push_back(*std::move(piece));
@@ -89,7 +89,7 @@ class Copier {
                    piece.header.width != first_.width || piece.header.height != first_.height) {
             throw SourceError(piece.path.string() + " has another format than the recording before it");
         }
-        // Where the wall clock was set back, the later recording follows the earlier all the same.
+        // Even if the wall clock was set back, the later recording comes after the earlier one.
         offset_ms_ = std::max(wall_ms - start_wall_ms_, last_ms_ + 1) - piece.begin_ms;
         Copy(piece);
     }
@@ -132,7 +132,7 @@ class Copier {
         std::int64_t reached_ms = -1;
         while (reached_ms < piece.last_ms) {
             av_packet_unref(packet_.get());
-            // A recording that grows may end inside a frame, but behind the last one that its index knows.
+            // A growing recording may end inside a frame, but only after the last frame in its index.
             CheckAv(av_read_frame(input_.get(), packet_.get()), "cannot read on in " + piece.path.string());
             const bool is_video = packet_->stream_index == video_;
             if ((!is_video && packet_->stream_index != audio_) || packet_->pts == AV_NOPTS_VALUE) {

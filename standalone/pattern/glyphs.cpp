@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A character is a set of lines, separated by commas; a line is a row of points, each two hexadecimal digits: x from 0
-// to 8, then y from 0 at the top to c on the base line.
+// A character is a set of lines, separated by commas; a line is a sequence of points, each two hexadecimal digits: x
+// from 0 to 8, then y from 0 at the top to c on the base line.
 #include "standalone/pattern/glyphs.h"
 
 #include <algorithm>

@@ -27,7 +27,7 @@ constexpr std::array<Palette, 4> kPalettes{{
     {{8, 14, 24}, {34, 50, 72}, {192, 158, 110}, {10, 13, 18}},   // before rain
 }};
 
-// The eight bars, dimmed so that they do not outshine the picture.
+// The eight bars, dimmed so that they do not dominate the picture.
 constexpr std::array<Colour, 8> kBars{{{190, 190, 190},
                                        {190, 184, 40},
                                        {40, 180, 184},
@@ -37,7 +37,7 @@ constexpr std::array<Colour, 8> kBars{{{190, 190, 190},
                                        {44, 58, 182},
                                        {18, 18, 22}}};
 
-// A small generator whose numbers are the same everywhere; std's distributions are not.
+// A random generator with the same numbers on every platform, unlike the distributions of the standard library.
 class Dice {
   public:
     explicit Dice(std::uint32_t seed) : state_(seed | 1) {}
@@ -79,7 +79,7 @@ class Canvas {
     std::vector<Colour> pixels_;
 };
 
-// A little noise below one step of brightness keeps smooth skies from showing bands.
+// Noise below one step of luma prevents banding in smooth skies.
 Picture Canvas::ToPicture(Dice& dice) {
     Picture picture;
     for (std::size_t p = 0; p < picture.size(); ++p) {
@@ -119,7 +119,7 @@ void DrawSky(Canvas& canvas, const Palette& palette, int width, int height, int 
     }
 }
 
-// Four chains of hills, the far ones pale with haze.
+// Four ranges of hills, the distant ones pale with haze.
 std::vector<int> DrawHills(Canvas& canvas, const Palette& palette, int width, int height, Dice& dice) {
     std::vector<int> ridge(static_cast<std::size_t>(width), height);
     for (const double near : {0.0, 0.33, 0.66, 1.0}) {

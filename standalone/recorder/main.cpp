@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven-recorder: takes the cameras' streams in and hands them on to viewers.
+// lookhaven-recorder: receives the cameras' streams, records them and passes them to viewers.
 #include <chrono>
 #include <csignal>
 #include <exception>
@@ -55,11 +55,12 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
 
 int main(int argc, char** argv) {
     base::SetLogProgram("recorder");
-    CLI::App app("Takes the cameras' streams in and hands them on to viewers.", "lookhaven-recorder");
+    CLI::App app("Receives the cameras' streams, records them and passes them to viewers.", "lookhaven-recorder");
     std::string home;
     double no_data_limit_s = 10;
     app.add_option("--home", home, "State folder; else LOOKHAVEN_HOME, else ./var");
-    app.add_option("--no-data-limit", no_data_limit_s, "Seconds without a picture after which a camera is tried anew")
+    app.add_option("--no-data-limit", no_data_limit_s,
+                   "Seconds without a picture after which the recorder reconnects to a camera")
         ->check(CLI::Range(0.1, 600.0))
         ->capture_default_str();
     try {

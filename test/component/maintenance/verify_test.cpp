@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What verify finds and mends when rows, recordings and indexes disagree: real recordings, damaged one way at a time.
+// What verify finds and repairs when rows, recordings and indexes disagree: real recordings, damaged one way at a time.
 #include "standalone/maintenance/verify.h"
 
 #include <array>
@@ -93,7 +93,7 @@ struct Damage {
     int frames;           // that the row and its recording have then; 0: there is no row
 };
 
-TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
+TEST_F(VerifyTest, FindsAndRepairsEachKindOfDamage) {
     const std::string recording = test::Contents(file_);
     const std::string index = test::Contents(Index());
     const fs::path day = file_.parent_path();
@@ -121,7 +121,7 @@ TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
         {"an unfinished index", [&] { test::Write(Index(), index.substr(0, 63) + '\0' + index.substr(64)); },
          "never closed", "closed", kFrames},
         {"a cut recording", [&] { fs::resize_file(file_, cluster + 20); }, "does not say", "closed", kFrames * 6 / 10},
-        {"damage within", [&] { Flip(file_, cluster); }, "damaged behind frame 60", "", kFrames},
+        {"damage within", [&] { Flip(file_, cluster); }, "damaged after frame 60", "", kFrames},
         {"an empty recording", [&] { test::Write(file_, ""); }, "cannot be read", "removed", 0},
         {"a foreign recording", [&] { test::Write(file_, "Dear aunt"); }, "cannot be read", "left", 0},
         {"no recording", [&] { fs::remove(file_); }, "has no file", "removed", 0},
@@ -129,7 +129,7 @@ TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
          "closed", kFrames},
         {"an open row", [&] { change_row([](store::Event& event) { event.recording = true; }); }, "does not say",
          "closed", kFrames},
-        {"no row", [&] { events.Remove(std::array{event_}); }, "no event has the file", "took in", kFrames},
+        {"no row", [&] { events.Remove(std::array{event_}); }, "no event has the file", "adopted", kFrames},
         {"a row that leads away", [&] { change_row([](store::Event& event) { event.path = "../../etc/passwd"; }); },
          "names no recording", "removed the event", kFrames},
         {"a lonely index", [&] { fs::copy(Index(), day / "130000-1.index"); }, "no recording to", "removed", kFrames},
@@ -144,15 +144,15 @@ TEST_F(VerifyTest, FindsAndMendsEachKindOfDamage) {
         const auto damaged = State();
         const VerifyReport found = Verify(Records(), false);
         EXPECT_EQ(State(), damaged) << "looking changed something";
-        const VerifyReport mended = Verify(Records(), true);
+        const VerifyReport repaired = Verify(Records(), true);
         ASSERT_EQ(found.faults.empty(), *each.problem == '\0');
         if (!found.faults.empty()) {
             EXPECT_THAT(found.faults.front().problem, HasSubstr(each.problem));
             EXPECT_THAT(found.faults.front().problem, testing::AnyOf(HasSubstr(folder_.Path()), HasSubstr("event 1")));
-            EXPECT_THAT(mended.faults.front().done, HasSubstr(each.done));
+            EXPECT_THAT(repaired.faults.front().done, HasSubstr(each.done));
         }
         if (*each.done == '\0') {
-            EXPECT_EQ(State(), damaged) << "repair changed what it cannot mend";
+            EXPECT_EQ(State(), damaged) << "repair changed what it cannot repair";
         } else if (each.done != std::string("left")) {
             EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
         }
@@ -183,7 +183,7 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     const fs::path foreign = file_.parent_path() / "130000-4711.mkv";
     fs::copy(file_, foreign);
     Age();
-    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("took in"));
+    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("adopted"));
     EXPECT_FALSE(fs::exists(foreign));
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
     fs::remove(footage_.Mount() / ".lookhaven-mount");
