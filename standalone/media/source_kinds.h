@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The kinds of camera source. To add one: write its class in a file of its own (rtsp_source.cpp shows how little it
-// needs), declare its SourceOpener here and give it a scheme in source_kinds.cpp.
+// needs), declare its SourceOpener here, give it a scheme in source_kinds.cpp, and let IsSource in store/text.cpp accept
+// that scheme.
 #pragma once
 
 #include <memory>
