@@ -6,9 +6,9 @@
 //           requests that end in time (deadline)
 //   live/   how a picture is kept live: sources of pictures behind one interface (source: stream_source streams,
 //           snapshot_source polls), reconnecting (feed, backoff), the verdict on what is shown (signal_state), and the
-//           sharing of few connections (stream_budget, turns). Of a compressed stream, media_part tells the pieces apart;
+//           sharing of few connections (stream_budget). Of a compressed stream, media_part tells the pieces apart;
 //           video_player decodes the picture (annexb, frame_gate), sound the sound (speaker_worklet with its
-//           jitter_buffer), and av_clock keeps them in step. An obstacle is why that cannot be done here.
+//           jitter_buffer), and av_clock keeps them in step. An unplayable is why that cannot be done here.
 //   playback/  how the past is played: history and days keep what the server told of it (coverage sorts it); a player plays
 //           one recording (frame_stream reads its frames, frame_clock knows their times), a deck several cameras in step.
 //   ui/     what is on the screen: login; wall with grid and tiles, large_view, snapshot_dialog; events_screen with the
@@ -28,13 +28,13 @@ import "./style/events.css";
 import "./style/timeline.css";
 import "./style/map.css";
 import "./style/map_editor.css";
-import { element } from "./ui/dom";
-import { EventsScreen } from "./ui/events_screen";
-import { loginScreen } from "./ui/login";
-import { MapsScreen } from "./ui/maps_screen";
-import { hideNotice } from "./ui/notice";
-import { openScreen, type Screen } from "./ui/route";
-import { Wall } from "./ui/wall";
+import { element } from "./ui/widgets/dom";
+import { EventsScreen } from "./ui/screens/events_screen";
+import { loginScreen } from "./ui/screens/login_screen";
+import { MapsScreen } from "./ui/screens/maps_screen";
+import { hideNotice } from "./ui/widgets/notice";
+import { openScreen, type Screen } from "./ui/screens/route";
+import { Wall } from "./ui/screens/wall_screen";
 import { Server, ServerError, type Account } from "./wire/server";
 
 const app = document.querySelector<HTMLElement>("#app")!;

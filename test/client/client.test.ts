@@ -2,8 +2,8 @@
 //
 // Answers of the server as the user gets to know them; file names; the arrangement of tiles.
 
-import { arrange } from "../../client/src/ui/layout";
-import { snapshotFileName } from "../../client/src/ui/text";
+import { arrange } from "../../client/src/ui/wall/layout";
+import { snapshotFileName } from "../../client/src/ui/widgets/text";
 import { Server, type Camera } from "../../client/src/wire/server";
 
 const json = (status: number, body: unknown) =>

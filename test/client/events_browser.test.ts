@@ -135,8 +135,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const times = await page.run(() => [...document.querySelectorAll(".stage-time")].map((time) => time.textContent!));
     const [first, second] = times.map((time) => Date.parse(`2026 ${time.slice(4)}`));
     expect(Math.abs(first! - second!)).toBeLessThanOrEqual(2000);
-    archive.streams[0]!.pushOut();
-    await page.until(() => document.querySelector(".stage-picture[data-state=pushedOut] .button") !== null);
+    archive.streams[0]!.preempt();
+    await page.until(() => document.querySelector(".stage-picture[data-state=preempted] .button") !== null);
     await page.send("Page.close", {});
     await vi.waitFor(() => expect(archive.streams).toEqual([]));
   }, 40_000);

@@ -18,7 +18,7 @@ interface Stream {
   key: number;
   rate: number;
   /** Ends it as another player does that takes the session. */
-  pushOut(): void;
+  preempt(): void;
 }
 
 const kTailMs = 2_000;
@@ -133,7 +133,7 @@ export class FakeArchive {
           end();
           controller.close();
         };
-        const stream: Stream = { key, rate, pushOut: close };
+        const stream: Stream = { key, rate, preempt: close };
         const send = () => {
           // A browser that does not read holds the server back.
           if ((controller.desiredSize ?? 0) > -20) {
@@ -149,7 +149,7 @@ export class FakeArchive {
           else timer = setTimeout(() => (index < found.frames ? send() : close()), kTailMs);
         };
         // A newer player of the session takes the place of the oldest.
-        if (this.streams.length >= this.playersPerSession) this.streams[0]!.pushOut();
+        if (this.streams.length >= this.playersPerSession) this.streams[0]!.preempt();
         this.streams.push(stream);
         signal?.addEventListener("abort", leave);
         send();

@@ -7,7 +7,7 @@ import { captureOf } from "../../client/src/live/media_part";
 import { SignalJudge } from "../../client/src/live/signal_state";
 import { chooseStreams, streamLimit } from "../../client/src/live/stream_budget";
 import { NewestPicture, StreamSource } from "../../client/src/live/stream_source";
-import { Turns } from "../../client/src/live/turns";
+import { Semaphore } from "../../client/src/wire/semaphore";
 import { ServerError, type Camera, type Server } from "../../client/src/wire/server";
 
 const kWallStartMs = 1_764_000_000_000;
@@ -134,8 +134,8 @@ test.each([
   expect([...chooseStreams(visible, new Set(streaming), limit)]).toEqual(chosen);
 });
 
-test("turns: one at a time in order, a failure or a leaver blocks nobody", async () => {
-  const turns = new Turns(1);
+test("semaphore: one at a time in order, a failure or a leaver blocks nobody", async () => {
+  const semaphore = new Semaphore(1);
   const log: string[] = [];
   const stay = new AbortController();
   const leave = new AbortController();
@@ -148,13 +148,13 @@ test("turns: one at a time in order, a failure or a leaver blocks nobody", async
       if (fails) throw new Error(name);
     };
   const all = [
-    turns.run(stay.signal, work("a", true)),
-    turns.run(leave.signal, work("b")),
-    turns.run(stay.signal, work("c")),
+    semaphore.run(stay.signal, work("a", true)),
+    semaphore.run(leave.signal, work("b")),
+    semaphore.run(stay.signal, work("c")),
   ];
   leave.abort();
   expect((await Promise.allSettled(all)).map(({ status }) => status)).toEqual(["rejected", "rejected", "fulfilled"]);
-  await turns.run(stay.signal, work("d"));
+  await semaphore.run(stay.signal, work("d"));
   expect(log).toEqual(["a in", "a out", "c in", "c out", "d in", "d out"]);
 });
 

@@ -2,7 +2,7 @@
 //
 // Maps without a browser: what the server's two forms of an item become, what is saved, and the editor's steps.
 
-import { EditHistory } from "../../client/src/ui/edit_history";
+import { EditHistory } from "../../client/src/ui/map/edit_history";
 import { Emaps } from "../../client/src/wire/emaps";
 import { Server } from "../../client/src/wire/server";
 

@@ -343,7 +343,7 @@ describe("a stream that cannot be played", () => {
     const source = new StreamSource(server, camera, false, stills);
     let frames = 0;
     for (let run = 0; run < 2; run += 1) await source.run(() => (frames += 1), new AbortController().signal);
-    expect(source.obstacle?.reason ?? null).toBe(reason);
+    expect(source.unplayable?.reason ?? null).toBe(reason);
     expect(frames).toBe(reason ? shown : shown + 3);
     expect(stills.run).toHaveBeenCalledTimes(reason ? 1 : 0);
     expect([source.everyMs, source.lostAfterMs]).toEqual(reason ? [2000, 10_000] : [0, 5000]);
@@ -363,11 +363,11 @@ describe("a stream that cannot be played", () => {
     const streaming = source.run(() => undefined, signal);
     await vi.advanceTimersByTimeAsync(100);
     await streaming;
-    expect(source.obstacle).not.toBe(null);
+    expect(source.unplayable).not.toBe(null);
     const polling = source.run(() => undefined, signal);
     await vi.advanceTimersByTimeAsync(60_001);
     await polling;
-    expect(source.obstacle).toBe(null);
+    expect(source.unplayable).toBe(null);
     vi.useRealTimers();
   });
 

@@ -3,10 +3,10 @@
 // Recordings: times and frames, days and segments, the timeline's scale, and a player against a server of its own.
 
 import { segmentsOf } from "../../client/src/playback/coverage";
-import { midnight, midnights, questionsFor } from "../../client/src/playback/days";
+import { midnight, midnights, questionsFor } from "../../client/src/playback/recorded_days";
 import { FrameClock } from "../../client/src/playback/frame_clock";
 import { Player } from "../../client/src/playback/player";
-import { TimeScale } from "../../client/src/ui/time_scale";
+import { TimeScale } from "../../client/src/ui/timeline/time_scale";
 import { Recordings, type Footage, type Runs } from "../../client/src/wire/recordings";
 import { Server } from "../../client/src/wire/server";
 import { FakeArchive } from "./fake_archive";
@@ -156,8 +156,8 @@ describe("a player", () => {
   test("one that another player replaces says so, leaves the session to it, and plays again on demand", async () => {
     player.open(footage(7), 0, true);
     await untilFrame(2);
-    archive.streams[0]!.pushOut();
-    await until("pushedOut");
+    archive.streams[0]!.preempt();
+    await until("preempted");
     expect(archive.asked).toHaveLength(1);
     player.play();
     await until("playing");

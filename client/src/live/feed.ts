@@ -2,10 +2,11 @@
 //
 // Keeps one picture on the screen live: runs a source, reconnects with growing waits, and judges the signal.
 
+import { delay } from "../wire/delay";
 import { ServerError } from "../wire/server";
 import { Backoff } from "./backoff";
 import { SignalJudge, type SignalState } from "./signal_state";
-import { pause, type Frame, type LiveSource } from "./source";
+import type { Frame, LiveSource } from "./source";
 
 export class Feed {
   readonly #show: (frame: Frame) => void;
@@ -78,7 +79,7 @@ export class Feed {
       this.#failure = failure;
       this.#judge.broke(failure?.message ?? "");
       this.#changed();
-      await pause(backoff.next(), signal);
+      await delay(backoff.next(), signal);
     }
   }
 }

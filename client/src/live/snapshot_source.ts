@@ -2,9 +2,10 @@
 //
 // Live pictures of a camera by asking for a snapshot again and again: for tiles that get no stream of their own.
 
+import { delay } from "../wire/delay";
 import type { Camera, Server } from "../wire/server";
-import { pause, type Frame, type LiveSource } from "./source";
-import type { Turns } from "./turns";
+import type { Frame, LiveSource } from "./source";
+import type { Semaphore } from "../wire/semaphore";
 
 /** A camera that answers does so at once; one that does not must not keep the others waiting for long. */
 const kAnswerLimitMs = 3_000;
@@ -14,19 +15,19 @@ export class SnapshotSource implements LiveSource {
   readonly everyMs = 2_000;
   readonly #server: Server;
   readonly #camera: Camera;
-  readonly #turns: Turns;
+  readonly #semaphore: Semaphore;
 
   /** `turns` is shared by all that poll the same server. */
-  constructor(server: Server, camera: Camera, turns: Turns) {
+  constructor(server: Server, camera: Camera, semaphore: Semaphore) {
     this.#server = server;
     this.#camera = camera;
-    this.#turns = turns;
+    this.#semaphore = semaphore;
   }
 
   async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
     while (!signal.aborted) {
       try {
-        const snapshot = await this.#turns.run(signal, () =>
+        const snapshot = await this.#semaphore.run(signal, () =>
           this.#server.snapshot(this.#camera, signal, kAnswerLimitMs),
         );
         const image = await createImageBitmap(snapshot.jpeg);
@@ -36,7 +37,7 @@ export class SnapshotSource implements LiveSource {
         if (signal.aborted) return;
         throw error;
       }
-      await pause(this.everyMs, signal);
+      await delay(this.everyMs, signal);
     }
   }
 }

@@ -22,17 +22,3 @@ export interface LiveSource {
    */
   run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void>;
 }
-
-/** Resolves after the time, or at once when `signal` is aborted. */
-export function pause(milliseconds: number, signal: AbortSignal): Promise<void> {
-  return new Promise((resolve) => {
-    if (signal.aborted) return resolve();
-    const done = () => {
-      clearTimeout(timer);
-      signal.removeEventListener("abort", done);
-      resolve();
-    };
-    const timer = setTimeout(done, milliseconds);
-    signal.addEventListener("abort", done);
-  });
-}

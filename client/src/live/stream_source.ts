@@ -12,8 +12,8 @@ import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
 import { kVideoTypeMjpeg, ServerError, type Camera, type Server } from "../wire/server";
 import { captureOf, mediaOf } from "./media_part";
-import { missingDecoder, type Obstacle } from "./obstacle";
-import type { Sound } from "./sound";
+import { missingDecoder, type Unplayable } from "./unplayable";
+import type { AudioPlayer } from "./audio_player";
 import type { Frame, LiveSource } from "./source";
 import { VideoPlayer } from "./video_player";
 
@@ -58,39 +58,39 @@ export class StreamSource implements LiveSource {
   readonly #camera: Camera;
   readonly #small: boolean;
   readonly #stills: LiveSource;
-  readonly #sound: Sound | null;
+  readonly #sound: AudioPlayer | null;
   #smallWorks = true;
-  #obstacle: Obstacle | null;
-  #obstacleEndsMs = 0;
+  #unplayable: Unplayable | null;
+  #retryAtMs = 0;
 
   /** `small` asks for the small picture, if the camera has one; `stills` stands in for a stream that cannot be played. */
-  constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, sound: Sound | null = null) {
+  constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, sound: AudioPlayer | null = null) {
     this.#server = server;
     this.#camera = camera;
     this.#small = small;
     this.#stills = stills;
     this.#sound = sound;
-    this.#obstacle = null;
+    this.#unplayable = null;
     const missing = camera.video_type === kVideoTypeMjpeg ? null : missingDecoder();
-    if (missing) this.#meet(missing);
+    if (missing) this.#markUnplayable(missing);
   }
 
   /** Why still pictures are shown, or null while the stream is worth a try. */
-  get obstacle(): Obstacle | null {
-    return performance.now() < this.#obstacleEndsMs ? this.#obstacle : null;
+  get unplayable(): Unplayable | null {
+    return performance.now() < this.#retryAtMs ? this.#unplayable : null;
   }
 
   get lostAfterMs(): number {
-    return this.obstacle ? this.#stills.lostAfterMs : 5_000;
+    return this.unplayable ? this.#stills.lostAfterMs : 5_000;
   }
 
   get everyMs(): number {
-    return this.obstacle ? this.#stills.everyMs : 0;
+    return this.unplayable ? this.#stills.everyMs : 0;
   }
 
   async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
-    if (!this.obstacle) return this.#play(show, signal);
-    const untilRetry = new Deadline(Math.min(this.#obstacleEndsMs - performance.now(), kForeverMs), signal);
+    if (!this.unplayable) return this.#play(show, signal);
+    const untilRetry = new Deadline(Math.min(this.#retryAtMs - performance.now(), kForeverMs), signal);
     try {
       await this.#stills.run(show, untilRetry.signal);
     } finally {
@@ -98,9 +98,9 @@ export class StreamSource implements LiveSource {
     }
   }
 
-  #meet(obstacle: Obstacle): void {
-    this.#obstacle = obstacle;
-    this.#obstacleEndsMs = performance.now() + obstacle.retryMs;
+  #markUnplayable(unplayable: Unplayable): void {
+    this.#unplayable = unplayable;
+    this.#retryAtMs = performance.now() + unplayable.retryMs;
   }
 
   async #play(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
@@ -131,8 +131,8 @@ export class StreamSource implements LiveSource {
       if (deadline.signal.aborted) return image.close();
       show({ image, ...capture });
     });
-    const giveUp = (obstacle: Obstacle) => {
-      this.#meet(obstacle);
+    const giveUp = (unplayable: Unplayable) => {
+      this.#markUnplayable(unplayable);
       deadline.release();
     };
     const video = new VideoPlayer(show, giveUp, this.#sound);
@@ -150,7 +150,7 @@ export class StreamSource implements LiveSource {
       const reader = answer.body.getReader();
       for (let read = await reader.read(); !read.done; read = await reader.read()) parser.push(read.value);
     } catch (error) {
-      if (owner.aborted || this.obstacle) return;
+      if (owner.aborted || this.unplayable) return;
       throw streamError(error);
     } finally {
       video.close();

@@ -6,8 +6,8 @@ import { factsOf, type VideoCodec } from "./annexb";
 import { PictureQueue } from "./av_clock";
 import { FrameGate } from "./frame_gate";
 import type { Capture } from "./media_part";
-import { kUndecodable, unsupported, type Obstacle } from "./obstacle";
-import type { Sound } from "./sound";
+import { kUndecodable, unsupported, type Unplayable } from "./unplayable";
+import type { AudioPlayer } from "./audio_player";
 import type { Frame } from "./source";
 
 /** A damaged piece now and then is no reason to give up a stream. */
@@ -24,8 +24,8 @@ interface Arrival extends Capture {
 
 export class VideoPlayer {
   readonly #show: (frame: Frame) => void;
-  readonly #giveUp: (obstacle: Obstacle) => void;
-  readonly #sound: Sound | null;
+  readonly #giveUp: (unplayable: Unplayable) => void;
+  readonly #sound: AudioPlayer | null;
   readonly #gate = new FrameGate();
   readonly #queue: PictureQueue<VideoFrame>;
   readonly #arrivals = new Map<number, Arrival>();
@@ -38,7 +38,7 @@ export class VideoPlayer {
   #closed = false;
 
   /** `giveUp` is called when the stream cannot be played; nothing is shown after that. */
-  constructor(show: (frame: Frame) => void, giveUp: (obstacle: Obstacle) => void, sound: Sound | null) {
+  constructor(show: (frame: Frame) => void, giveUp: (unplayable: Unplayable) => void, sound: AudioPlayer | null) {
     this.#show = show;
     this.#giveUp = giveUp;
     this.#sound = sound;
@@ -102,9 +102,9 @@ export class VideoPlayer {
     else if (this.#errors.length >= kMostErrors) this.#end(kUndecodable);
   }
 
-  #end(obstacle: Obstacle): void {
+  #end(unplayable: Unplayable): void {
     this.close();
-    this.#giveUp(obstacle);
+    this.#giveUp(unplayable);
   }
 
   #receive(picture: VideoFrame): void {

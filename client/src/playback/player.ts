@@ -9,7 +9,7 @@
 //               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
 //               recording that still grows goes on as it grows, and ends with it.
 
-import { pause as wait } from "../live/source";
+import { delay } from "../wire/delay";
 import { newStreamKey, type Footage, type Recordings, type Start } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { FrameClock } from "./frame_clock";
@@ -20,7 +20,7 @@ export type PlayerState =
   | { kind: "empty" }
   | { kind: "opening" | "playing" | "paused" | "ended" }
   /** The server ended the stream before its end: another player of this session has taken over. */
-  | { kind: "pushedOut" }
+  | { kind: "preempted" }
   | { kind: "failed"; reason: string };
 
 /** Slow motion by that factor below 0; above, that many frames at a time. */
@@ -260,12 +260,12 @@ export class Player {
     this.#take(footage);
     const isAtEnd = !footage.isGrowing && this.#index + Math.max(1, this.#rate) >= footage.frameCount;
     if (!wasAtTail || isAtEnd) {
-      this.#become({ kind: wasAtTail ? "ended" : "pushedOut" });
+      this.#become({ kind: wasAtTail ? "ended" : "preempted" });
       return false;
     }
     // At the end of what there is, no rate is faster than the camera.
     if (footage.isGrowing && this.#rate > 1) this.#rate = 1;
-    if (footage.isGrowing) await wait(kTailPauseMs, signal);
+    if (footage.isGrowing) await delay(kTailPauseMs, signal);
     return !signal.aborted;
   }
 
