@@ -1,26 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The sound of one camera: silent until the user wants it, then decoded and played from a jitter buffer.
+// Plays the sound of one camera: off until the user wants it, then decoded and played from a jitter buffer.
 
-import { HeardClock, SentTimes } from "./av_clock";
+import { AudibleClock, TimestampMatcher } from "./av_clock";
 import type { MediaPart } from "./media_part";
 import workletAddress from "./speaker_worklet.ts?worker&url";
-import type { SpeakerOrder, SpeakerReport } from "./speaker_worklet";
+import type { SpeakerCommand, SpeakerReport } from "./speaker_worklet";
 
-export type SoundPart = Extract<MediaPart, { kind: "sound" }>;
+export type AudioPart = Extract<MediaPart, { kind: "audio" }>;
 
-/** Some seconds of sound. */
-const kLongestQueue = 200;
-/** No piece of sound is so long. */
-const kGapUs = 300_000;
+/** Some seconds of audio. */
+const kMaxQueued = 200;
+/** Longer than any chunk of audio. */
+const kMaxGapUs = 300_000;
 
 /** The audio context with the worklet in it. */
 class Speaker {
-  readonly clock = new HeardClock();
+  readonly clock = new AudibleClock();
   readonly #context: AudioContext;
   #node: AudioWorkletNode | null = null;
 
-  /** Call it while the user clicks: browsers let no page sound by itself. */
+  /** Call it while handling a click or key: browsers let no page play sound by itself. */
   constructor(rate: number) {
     this.#context = new AudioContext({ sampleRate: rate, latencyHint: "interactive" });
   }
@@ -34,18 +34,18 @@ class Speaker {
     this.#node.connect(this.#context.destination);
   }
 
-  send(order: SpeakerOrder): void {
-    this.#node?.port.postMessage(order, "channels" in order ? order.channels.map(({ buffer }) => buffer) : []);
+  send(command: SpeakerCommand): void {
+    this.#node?.port.postMessage(command, "channels" in command ? command.channels.map(({ buffer }) => buffer) : []);
   }
 
-  heardUs(nowMs: number): number | null {
+  audibleUs(nowMs: number): number | null {
     const { contextTime = 0, performanceTime = 0 } = this.#context.getOutputTimestamp();
-    // Without a time stamp of the output, what the context says of its delay has to do.
+    // Without a timestamp of the output, the latency that the context reports has to do.
     const audibleTime =
       performanceTime > 0
         ? contextTime + (nowMs - performanceTime) / 1000
         : this.#context.currentTime - (this.#context.outputLatency || this.#context.baseLatency);
-    return this.clock.heardUs(audibleTime, nowMs);
+    return this.clock.audibleUs(audibleTime, nowMs);
   }
 
   close(): void {
@@ -59,34 +59,34 @@ export class AudioPlayer {
   #config: AudioDecoderConfig | null = null;
   #decoder: AudioDecoder | null = null;
   #speaker: Speaker | null = null;
-  #times = new SentTimes();
-  #heardOf = false;
+  #timestamps = new TimestampMatcher();
+  #exists = false;
   #lastUs = 0;
-  #trouble = "";
+  #error = "";
 
-  /** `changed` is told when the control for the sound has something new to say. */
+  /** `changed` is called when existence, state or error of the sound has changed. */
   constructor(changed: () => void) {
     this.#changed = changed;
   }
 
-  /** Whether the camera sends any. */
+  /** Whether the camera has sent any sound. */
   get exists(): boolean {
-    return this.#heardOf;
+    return this.#exists;
   }
 
   get isOn(): boolean {
     return this.#speaker !== null;
   }
 
-  /** Why it cannot be heard, or empty. */
-  get trouble(): string {
-    return this.#trouble;
+  /** Why it cannot be played; empty when it can. */
+  get error(): string {
+    return this.#error;
   }
 
-  /** Call it while the user clicks. */
+  /** Call it while handling a click or key. */
   async switchOn(): Promise<void> {
     if (this.#speaker || !this.#config) return;
-    this.#trouble = "";
+    this.#error = "";
     let speaker: Speaker | null = null;
     try {
       speaker = this.#speaker = new Speaker(this.#config.sampleRate);
@@ -105,42 +105,42 @@ export class AudioPlayer {
     this.#changed();
   }
 
-  take(part: SoundPart, body: Uint8Array): void {
-    if (!this.#heardOf || !sameConfig(part.config, this.#config)) {
-      this.#heardOf = true;
+  take(part: AudioPart, body: Uint8Array): void {
+    if (!this.#exists || !sameConfig(part.config, this.#config)) {
+      this.#exists = true;
       this.#config = part.config;
-      this.#trouble = part.config ? "" : `The sound (${part.codec}) cannot be played`;
+      this.#error = part.config ? "" : `The sound (${part.codec}) cannot be played`;
       this.#dropDecoder();
       this.#changed();
     }
     if (this.#speaker && this.#config) this.#decode(this.#speaker, this.#config, part.timestampUs, body);
   }
 
-  /** Stream time in µs of what is heard now; null when nothing is. */
-  heardUs(nowMs: number): number | null {
-    return this.#speaker?.heardUs(nowMs) ?? null;
+  /** Stream time in µs of what is audible now; null when nothing is. */
+  audibleUs(nowMs: number): number | null {
+    return this.#speaker?.audibleUs(nowMs) ?? null;
   }
 
-  /** Lets the sound come later, for a picture that comes after it. */
-  wait(us: number): void {
-    this.#speaker?.send({ waitMs: us / 1000 });
+  /** Delays the sound by this much more, for video that comes later than it. */
+  postpone(us: number): void {
+    this.#speaker?.send({ postponeMs: us / 1000 });
   }
 
   #decode(speaker: Speaker, config: AudioDecoderConfig, timestamp: number, data: Uint8Array): void {
     const stepUs = timestamp - this.#lastUs;
     this.#lastUs = timestamp;
     try {
-      // A decoder would join what lies on both sides of a gap.
-      if (stepUs < 0 || stepUs > kGapUs || (this.#decoder?.decodeQueueSize ?? 0) > kLongestQueue) this.#dropDecoder();
+      // A decoder would join the audio on both sides of a gap.
+      if (stepUs < 0 || stepUs > kMaxGapUs || (this.#decoder?.decodeQueueSize ?? 0) > kMaxQueued) this.#dropDecoder();
       if (!this.#decoder) {
-        const times = (this.#times = new SentTimes());
+        const timestamps = (this.#timestamps = new TimestampMatcher());
         this.#decoder = new AudioDecoder({
-          output: (decoded) => speaker.send(pieceOf(decoded, times.decoded(decoded.timestamp))),
+          output: (decoded) => speaker.send(chunkOf(decoded, timestamps.decoded(decoded.timestamp))),
           error: () => this.#fail("The sound cannot be decoded"),
         });
         this.#decoder.configure(config);
       }
-      this.#times.sent(timestamp);
+      this.#timestamps.sent(timestamp);
       this.#decoder.decode(new EncodedAudioChunk({ type: "key", timestamp, data }));
     } catch {
       this.#fail("The sound cannot be decoded");
@@ -152,21 +152,21 @@ export class AudioPlayer {
     this.#decoder = null;
   }
 
-  #fail(trouble: string): void {
-    this.#trouble = trouble;
+  #fail(error: string): void {
+    this.#error = error;
     this.switchOff();
   }
 }
 
-function pieceOf(decoded: AudioData, timestampUs: number): SpeakerOrder {
+function chunkOf(decoded: AudioData, timestampUs: number): SpeakerCommand {
   const channels = Array.from({ length: Math.min(decoded.numberOfChannels, 2) }, (_, planeIndex) => {
     const samples = new Float32Array(decoded.numberOfFrames);
     decoded.copyTo(samples, { planeIndex, format: "f32-planar" });
     return samples;
   });
-  const piece = { timestampUs, rate: decoded.sampleRate, channels };
+  const chunk = { timestampUs, rate: decoded.sampleRate, channels };
   decoded.close();
-  return piece;
+  return chunk;
 }
 
 function sameConfig(one: AudioDecoderConfig | null, other: AudioDecoderConfig | null): boolean {

@@ -1,18 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Live pictures of a camera by asking for a snapshot again and again: for tiles that get no stream of their own.
+// Live pictures of a camera by polling for snapshots: for tiles without a stream of their own.
 
 import { delay } from "../wire/delay";
 import type { Camera, Server } from "../wire/server";
 import type { Frame, LiveSource } from "./source";
 import type { Semaphore } from "../wire/semaphore";
 
-/** A camera that answers does so at once; one that does not must not keep the others waiting for long. */
-const kAnswerLimitMs = 3_000;
+/** Short, since a camera that does not answer must not hold up the others. */
+const kAnswerTimeoutMs = 3_000;
 
 export class SnapshotSource implements LiveSource {
   readonly lostAfterMs = 10_000;
-  readonly everyMs = 2_000;
+  readonly pollIntervalMs = 2_000;
   readonly #server: Server;
   readonly #camera: Camera;
   readonly #semaphore: Semaphore;
@@ -28,7 +28,7 @@ export class SnapshotSource implements LiveSource {
     while (!signal.aborted) {
       try {
         const snapshot = await this.#semaphore.run(signal, () =>
-          this.#server.snapshot(this.#camera, signal, kAnswerLimitMs),
+          this.#server.snapshot(this.#camera, signal, kAnswerTimeoutMs),
         );
         const image = await createImageBitmap(snapshot.jpeg);
         if (signal.aborted) return image.close();
@@ -37,7 +37,7 @@ export class SnapshotSource implements LiveSource {
         if (signal.aborted) return;
         throw error;
       }
-      await delay(this.everyMs, signal);
+      await delay(this.pollIntervalMs, signal);
     }
   }
 }

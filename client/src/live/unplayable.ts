@@ -5,9 +5,9 @@
 export interface Unplayable {
   /** For the user, without a full stop. */
   reason: string;
-  /** After so long it may be gone. */
+  /** How long to wait before the stream is tried again. */
   retryMs: number;
-  /** Where the user goes to be rid of it. */
+  /** Where the stream can be played. */
   remedy?: { label: string; address: string };
 }
 
@@ -19,7 +19,7 @@ export function secureAddress(page: Location = location): string {
   return `https://${page.hostname}${port === "443" ? "" : `:${port}`}${page.pathname}${page.hash}`;
 }
 
-/** What keeps this browser from decoding any stream, or null. */
+/** Why this browser can decode no stream at all; null where it can. */
 export function missingDecoder(): Unplayable | null {
   if (typeof VideoDecoder !== "undefined") return null;
   if (isSecureContext) return { reason: "This browser is too old to play live video", retryMs: Infinity };

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is known of the cameras' past: events, marks and coverage, fetched a few hours at a time and kept.
+// Events, marks and coverage of the cameras, fetched a few hours at a time and kept.
 //
 // Why so        A timeline that is dragged asks for the same hours again and again, and each answer covers hours of all
-//               cameras. So the past is cut into spans of fixed borders; those that touch the present are fetched anew.
+//               cameras. So time is cut into spans of fixed borders; those that reach the present are fetched again.
 
 import { ServerError } from "../wire/server";
 import type { Footage, FootageRef, Recordings } from "../wire/recordings";
@@ -12,8 +12,8 @@ import { RequestQueue } from "./request_queue";
 
 const kSpanS = 6 * 3600;
 const kIntervalS = 5;
-/** Spans kept, of all cameras together; the oldest asked for go first. */
-const kMostSpans = 4_000;
+/** Spans kept, of all cameras together; those fetched longest ago go first. */
+const kMaxSpans = 4_000;
 const kNoSuchApi = 404;
 
 interface Span {
@@ -29,8 +29,8 @@ export class FootageCache {
   readonly #changed: () => void;
   readonly #requests = new RequestQueue();
   readonly #spans = new Map<string, Span>();
-  /** Answers put together, until one of their spans changes. */
-  readonly #answers = new Map<string, { version: number; footage: Footage[]; segments: Segment[] }>();
+  /** What `get` has put together, valid until a span changes. */
+  readonly #merged = new Map<string, { version: number; footage: Footage[]; segments: Segment[] }>();
   #version = 0;
 
   /** `changed` is called when more is known. */
@@ -48,46 +48,46 @@ export class FootageCache {
     return this.#requests.error;
   }
 
-  /** Fetches what is not known of the cameras from `fromS` to `toS`; with `anew` also what was still to come. */
-  async ask(cameras: readonly number[], fromS: number, toS: number, anew = false): Promise<void> {
+  /** Fetches what is not known of the cameras from `fromS` to `toS`; with `refresh` also what was incomplete. */
+  async load(cameras: readonly number[], fromS: number, toS: number, refresh = false): Promise<void> {
     const last = Math.min(toS, Date.now() / 1000);
     const work: Promise<void>[] = [];
     for (let start = spanStart(fromS); start < last; start += kSpanS) {
-      const wanted = cameras.filter((camera) => {
-        const span = this.#spans.get(nameOf(camera, start));
-        return !span || (anew && span.isOpen);
+      const missing = cameras.filter((camera) => {
+        const span = this.#spans.get(keyOf(camera, start));
+        return !span || (refresh && span.isOpen);
       });
-      if (wanted.length > 0) work.push(this.#requests.run(`${start} ${wanted}`, () => this.#load(wanted, start)));
+      if (missing.length > 0) work.push(this.#requests.run(`${start} ${missing}`, () => this.#fetch(missing, start)));
     }
     await Promise.all(work);
   }
 
-  /** Events and marks of a camera that touch the span, by start, and what of it was recorded; as far as it is known. */
-  of(camera: number, fromS: number, toS: number): { footage: Footage[]; segments: Segment[] } {
+  /** What is known of a camera's events and marks that touch the span, by start, and of what was recorded. */
+  get(camera: number, fromS: number, toS: number): { footage: Footage[]; segments: Segment[] } {
     const [first, last] = [spanStart(fromS), spanStart(toS)];
-    const name = `${camera} ${first} ${last}`;
-    const kept = this.#answers.get(name);
+    const key = `${camera} ${first} ${last}`;
+    const kept = this.#merged.get(key);
     if (kept?.version === this.#version) return kept;
     const footage = new Map<string, Footage>();
     const segments: Segment[] = [];
     for (let start = first; start <= last; start += kSpanS) {
-      const span = this.#spans.get(nameOf(camera, start));
+      const span = this.#spans.get(keyOf(camera, start));
       for (const one of [...(span?.events ?? []), ...(span?.marks ?? [])]) footage.set(`${one.kind}${one.id}`, one);
       for (const segment of span?.segments ?? []) addSegment(segments, segment);
     }
     const sorted = [...footage.values()].sort((one, other) => one.start - other.start || one.id - other.id);
     const answer = { version: this.#version, footage: sorted, segments };
-    if (this.#answers.size > 256) this.#answers.clear();
-    this.#answers.set(name, answer);
+    if (this.#merged.size > 256) this.#merged.clear();
+    this.#merged.set(key, answer);
     return answer;
   }
 
-  /** The newest that is known of it. */
+  /** What was fetched last of it. */
   newest({ kind, id }: FootageRef, camera: number, startS: number): Footage | null {
-    return this.of(camera, startS, startS + 1).footage.find((one) => one.kind === kind && one.id === id) ?? null;
+    return this.get(camera, startS, startS + 1).footage.find((one) => one.kind === kind && one.id === id) ?? null;
   }
 
-  async #load(cameras: readonly number[], start: number): Promise<void> {
+  async #fetch(cameras: readonly number[], start: number): Promise<void> {
     const isOpen = Date.now() / 1000 < start + kSpanS + 60;
     const end = start + kSpanS;
     const [histories, marks] = await Promise.all([
@@ -101,7 +101,7 @@ export class FootageCache {
     for (const camera of cameras) {
       const history = histories.find((one) => one.camera === camera);
       const coverage = history?.coverage;
-      this.#keep(nameOf(camera, start), {
+      this.#keep(keyOf(camera, start), {
         events: history?.events ?? [],
         marks: marks.filter((mark) => mark.camera === camera),
         segments: coverage ? segmentsOf(start, end, coverage.interval, coverage.runs) : [],
@@ -112,11 +112,11 @@ export class FootageCache {
     this.#changed();
   }
 
-  #keep(name: string, span: Span): void {
-    this.#spans.delete(name);
-    this.#spans.set(name, span);
+  #keep(key: string, span: Span): void {
+    this.#spans.delete(key);
+    this.#spans.set(key, span);
     for (const oldest of this.#spans.keys()) {
-      if (this.#spans.size <= kMostSpans) break;
+      if (this.#spans.size <= kMaxSpans) break;
       this.#spans.delete(oldest);
     }
   }
@@ -126,7 +126,7 @@ function spanStart(timeS: number): number {
   return Math.floor(timeS / kSpanS) * kSpanS;
 }
 
-function nameOf(camera: number, start: number): string {
+function keyOf(camera: number, start: number): string {
   return `${camera} ${start}`;
 }
 

@@ -3,15 +3,15 @@
 // Which days have recordings, in days of the user's own time zone.
 //
 // Why so        The server counts days of 24 hours from any start. Local midnights are 24 hours apart but for two days a
-//               year, so a question for many days is cut where the clock is changed. A day of 25 hours is asked for as two
-//               from its start; one of 23 hours looks an hour into the next.
+//               year, so a request for many days is split there. Of a day of 25 hours the last hour is left out; one of 23
+//               hours includes the first hour of the next.
 
 import type { Recordings } from "../wire/recordings";
 import { RequestQueue } from "./request_queue";
 
 const kDayMs = 86_400_000;
-/** The most the server answers at once. */
-const kMostDays = 128;
+/** The most days that the server answers for at once. */
+const kMaxDays = 128;
 
 /** The local midnight at or before the time, `days` later. */
 export function midnight(unixMs: number, days = 0): number {
@@ -26,22 +26,22 @@ export function midnights(fromMs: number, toMs: number): number[] {
   return days;
 }
 
-/** Questions for as many days of 24 hours each as there are in a row. */
-export function questionsFor(days: readonly number[]): { startMs: number; count: number }[] {
-  const questions: { startMs: number; count: number }[] = [];
+/** One request for each row of days that are 24 hours apart. */
+export function requestsFor(days: readonly number[]): { startMs: number; count: number }[] {
+  const requests: { startMs: number; count: number }[] = [];
   for (const startMs of days) {
-    const last = questions.at(-1);
-    if (last && last.startMs + last.count * kDayMs === startMs && last.count < kMostDays) last.count += 1;
-    else questions.push({ startMs, count: 1 });
+    const last = requests.at(-1);
+    if (last && last.startMs + last.count * kDayMs === startMs && last.count < kMaxDays) last.count += 1;
+    else requests.push({ startMs, count: 1 });
   }
-  return questions;
+  return requests;
 }
 
 export class RecordedDays {
   readonly #recordings: Recordings;
   readonly #changed: () => void;
   readonly #requests = new RequestQueue();
-  /** By camera (0: any of the chosen ones) and midnight. */
+  /** By camera and midnight. */
   readonly #known = new Map<string, boolean>();
 
   constructor(recordings: Recordings, changed: () => void) {
@@ -49,25 +49,25 @@ export class RecordedDays {
     this.#changed = changed;
   }
 
-  /** Undefined while nobody knows; ask for it then. */
+  /** Undefined where it was not loaded. */
   has(camera: number, dayMs: number): boolean | undefined {
     return this.#known.get(`${camera} ${dayMs}`);
   }
 
-  /** Asks for those that are not known; of today it is asked again. */
-  ask(cameras: readonly number[], fromMs: number, toMs: number): void {
+  /** Fetches the days that are not known; `changed` is called for each answer. */
+  load(cameras: readonly number[], fromMs: number, toMs: number): void {
     for (const camera of cameras) {
       const days = midnights(fromMs, Math.min(toMs, Date.now())).filter((day) => this.has(camera, day) === undefined);
-      for (const question of questionsFor(days)) void this.#load(camera, question);
+      for (const request of requestsFor(days)) void this.#fetch(camera, request);
     }
   }
 
-  /** Forgets what may have changed: today gets its first recording, retention takes the last ones. */
-  forget(): void {
+  /** Call it now and then: today gets its first recording, retention deletes the last of old days. */
+  clear(): void {
     this.#known.clear();
   }
 
-  async #load(camera: number, { startMs, count }: { startMs: number; count: number }): Promise<void> {
+  async #fetch(camera: number, { startMs, count }: { startMs: number; count: number }): Promise<void> {
     await this.#requests.run(`${camera} ${startMs} ${count}`, async () => {
       const days = await this.#recordings.days(startMs / 1000, count, [camera]);
       days.forEach((day, index) => this.#known.set(`${camera} ${startMs + index * kDayMs}`, day));

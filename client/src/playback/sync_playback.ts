@@ -17,31 +17,31 @@ export interface Track {
 }
 
 /** Recordings this close to each other are one to the user. */
-const kGapS = 3;
-/** How far a player may be from the playhead, and how often it is brought back. */
-const kApartMs = 1_500;
-const kRejoinMs = 5_000;
+const kMaxGapS = 3;
+/** How far a player may be from the playhead, and how often at most it is brought back. */
+const kMaxApartMs = 1_500;
+const kRejoinIntervalMs = 5_000;
 const kSameFrameMs = 40;
-/** How far ahead the deck looks for what comes next. */
+/** How far ahead the next recording is looked for. */
 const kLookAheadS = 6 * 3600;
 
 export class SyncPlayback {
   readonly #recordings: Recordings;
-  readonly #history: FootageCache;
+  readonly #cache: FootageCache;
   readonly #changed: () => void;
   #tracks: Track[] = [];
   #lead: Track | null = null;
   #playheadMs: number | null = null;
   #isPlaying = false;
   #rate = 1;
-  #isSeekingOn = false;
-  /** When a track was last brought to the playhead, and where that was. */
+  #isAdvancing = false;
+  /** When a track was last brought to the playhead, and where the playhead was. */
   readonly #joined = new Map<Track, { clockMs: number; atMs: number }>();
 
   /** `changed` is called whenever there is something else to show. */
-  constructor(recordings: Recordings, history: FootageCache, changed: () => void) {
+  constructor(recordings: Recordings, cache: FootageCache, changed: () => void) {
     this.#recordings = recordings;
-    this.#history = history;
+    this.#cache = cache;
     this.#changed = changed;
   }
 
@@ -98,7 +98,7 @@ export class SyncPlayback {
       const footage = isInMark ? current : this.#at(track.camera, atMs);
       if (footage) return this.open(footage, atMs, isPlaying);
     }
-    // A hole on all cameras: nothing to show, but that is what was asked for.
+    // None of the cameras has a recording there.
     this.#playheadMs = atMs;
     this.#isPlaying = false;
     for (const track of this.#tracks) track.player.close();
@@ -109,8 +109,8 @@ export class SyncPlayback {
     if (this.#playheadMs === null) return;
     this.#isPlaying = true;
     const lead = this.#lead?.player;
-    if (!lead?.footage) void this.#goOn();
-    else if (lead.state.kind === "ended") void this.#goOn(() => lead.play());
+    if (!lead?.footage) void this.#advance();
+    else if (lead.state.kind === "ended") void this.#advance(() => lead.play());
     else for (const { player } of this.#tracks) player.play();
     this.#changed();
   }
@@ -138,16 +138,16 @@ export class SyncPlayback {
   tick(): void {
     const playheadMs = this.#playheadMs;
     if (!this.#isPlaying || playheadMs === null) return;
-    void this.#history.ask(
+    void this.#cache.load(
       this.#tracks.map(({ camera }) => camera),
       playheadMs / 1000,
       playheadMs / 1000 + 600,
     );
     for (const track of this.#tracks) {
-      if (track === this.#lead || performance.now() - (this.#joined.get(track)?.clockMs ?? -Infinity) < kRejoinMs) continue;
+      if (track === this.#lead || performance.now() - (this.#joined.get(track)?.clockMs ?? -Infinity) < kRejoinIntervalMs) continue;
       const { state, timeMs } = track.player;
       const isIdle = state.kind === "empty" || state.kind === "ended";
-      const isApart = state.kind === "playing" && Math.abs(timeMs - playheadMs) > kApartMs;
+      const isApart = state.kind === "playing" && Math.abs(timeMs - playheadMs) > kMaxApartMs;
       if (isIdle || isApart) this.#join(track, true);
     }
   }
@@ -157,13 +157,13 @@ export class SyncPlayback {
     for (const { player } of this.#tracks) player.close();
   }
 
-  /** The recording before (-1) or after (1) the one that leads, on its camera. */
-  async neighbour(by: 1 | -1): Promise<Footage | null> {
+  /** The recording before (-1) or after (1) the leading one, on its camera and within six hours; null where there is none. */
+  async adjacent(by: 1 | -1): Promise<Footage | null> {
     const lead = this.#lead;
     const atS = lead?.player.footage?.start ?? (this.#playheadMs ?? Date.now()) / 1000;
     if (!lead) return null;
     const [fromS, toS] = by > 0 ? [atS, atS + kLookAheadS] : [atS - kLookAheadS, atS];
-    await this.#history.ask([lead.camera], fromS, toS);
+    await this.#cache.load([lead.camera], fromS, toS);
     const events = this.#events(lead.camera, fromS, toS);
     return (by > 0 ? events.find(({ start }) => start > atS) : events.findLast(({ start }) => start < atS)) ?? null;
   }
@@ -179,16 +179,16 @@ export class SyncPlayback {
     const { state, timeMs, footage, rate } = track.player;
     if (track === this.#lead && footage) {
       if (state.kind === "playing" || state.kind === "paused") this.#playheadMs = timeMs;
-      if (state.kind === "ended" && this.#isPlaying) void this.#goOn();
+      if (state.kind === "ended" && this.#isPlaying) void this.#advance();
       if (state.kind === "failed" || state.kind === "preempted") this.#isPlaying = false;
       // A player slows down when it comes to the end of what is still being recorded.
       if (state.kind === "playing" && rate !== this.#rate) this.#rate = rate;
-      if (state.kind === "paused" && !this.#isPlaying) this.#bringOthers();
+      if (state.kind === "paused" && !this.#isPlaying) this.#alignOthers();
     }
     this.#changed();
   }
 
-  #bringOthers(): void {
+  #alignOthers(): void {
     for (const other of this.#tracks) {
       if (other === this.#lead || this.#playheadMs === null) continue;
       const atMs = this.#joined.get(other)?.atMs ?? -Infinity;
@@ -210,13 +210,13 @@ export class SyncPlayback {
   }
 
   #events(camera: number, fromS: number, toS: number): Footage[] {
-    return this.#history.of(camera, fromS, toS).footage.filter(({ kind, isSaved }) => kind === "event" && isSaved);
+    return this.#cache.get(camera, fromS, toS).footage.filter(({ kind, isSaved }) => kind === "event" && isSaved);
   }
 
-  /** Goes on behind the playhead; where nothing follows, `otherwise` or the end. */
-  async #goOn(otherwise?: () => void): Promise<void> {
-    if (this.#isSeekingOn) return;
-    this.#isSeekingOn = true;
+  /** Plays what comes after the playhead; where nothing does, calls `otherwise`, or stops. */
+  async #advance(otherwise?: () => void): Promise<void> {
+    if (this.#isAdvancing) return;
+    this.#isAdvancing = true;
     try {
       const current = this.#lead?.player.footage ?? null;
       const next = current && current.kind !== "event" ? null : await this.#next(current);
@@ -226,7 +226,7 @@ export class SyncPlayback {
       else if (otherwise) otherwise();
       else this.#isPlaying = false;
     } finally {
-      this.#isSeekingOn = false;
+      this.#isAdvancing = false;
       this.#changed();
     }
   }
@@ -234,17 +234,17 @@ export class SyncPlayback {
   async #next(current: Footage | null): Promise<Footage | null> {
     const fromS = current?.stop ?? (this.#playheadMs ?? 0) / 1000;
     const cameras = this.#tracks.map(({ camera }) => camera);
-    await this.#history.ask(cameras, fromS - 1, fromS + kLookAheadS, true);
+    await this.#cache.load(cameras, fromS - 1, fromS + kLookAheadS, true);
     const candidates = cameras.flatMap((camera) => {
       const events = this.#events(camera, fromS - 1, fromS + kLookAheadS);
       const after = (one: Footage) => one.id !== current?.id && one.start >= (current ? current.start : fromS);
       return events.slice(firstEndingAfter(events, fromS)).find(after) ?? [];
     });
-    const followsAtOnce = candidates.find(({ camera, start }) => camera === current?.camera && start <= fromS + kGapS);
+    const followsAtOnce = candidates.find(({ camera, start }) => camera === current?.camera && start <= fromS + kMaxGapS);
     return followsAtOnce ?? candidates.sort((one, other) => one.start - other.start)[0] ?? null;
   }
 }
 
 function covers({ start, stop, isGrowing }: Footage, atMs: number): boolean {
-  return start * 1000 <= atMs && atMs < stop * 1000 + (isGrowing ? kGapS * 1000 : 0);
+  return start * 1000 <= atMs && atMs < stop * 1000 + (isGrowing ? kMaxGapS * 1000 : 0);
 }

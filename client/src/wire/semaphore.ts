@@ -1,16 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Lets a fixed number of requests run at a time, the others in the order in which they asked.
+// Lets a fixed number of requests run at a time; the others wait in order.
 
 export class Semaphore {
   #free: number;
   readonly #waiting: (() => void)[] = [];
 
-  constructor(atOnce: number) {
-    this.#free = atOnce;
+  constructor(maxConcurrent: number) {
+    this.#free = maxConcurrent;
   }
 
-  /** Runs `work` when it is its turn. Rejects without running it when `signal` is aborted while it waits. */
+  /** Runs `work` as soon as it may. Rejects without running it when `signal` is aborted while it waits. */
   async run<Result>(signal: AbortSignal, work: () => Promise<Result>): Promise<Result> {
     if (this.#free > 0) this.#free -= 1;
     else await this.#wait(signal);

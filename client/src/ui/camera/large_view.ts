@@ -11,13 +11,13 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { notify } from "../widgets/notice";
-import { Picture } from "./live_picture";
-import { sentenceOf } from "../widgets/text";
+import { LivePicture } from "./live_picture";
+import { signalText } from "../widgets/text";
 
 export interface LargeViewActions {
   back(): void;
-  /** Goes on to the next camera (1) or the previous one (-1). */
-  step(by: 1 | -1): void;
+  /** Goes on to the next camera (1) or the previous one (-1); absent where there is no order. */
+  step?(by: 1 | -1): void;
   snapshot(): void;
   fullScreen(): void;
 }
@@ -26,23 +26,23 @@ export class LargeView {
   readonly root: HTMLElement;
   readonly camera: Camera;
   readonly #actions: LargeViewActions;
-  readonly #picture: Picture;
+  readonly #picture: LivePicture;
   readonly #source: StreamSource;
-  readonly #sound = new AudioPlayer(() => this.#showSound());
+  readonly #audio = new AudioPlayer(() => this.#showSound());
   readonly #soundButton = element("button", {
     type: "button",
     class: "icon-button sound",
     "aria-label": "Sound",
     hidden: true,
   });
-  readonly #soundWord = element("span");
+  readonly #soundLabel = element("span");
   readonly #state = element("span", { class: "large-state" });
   readonly #description = element("span", { class: "large-description" });
   readonly #back: HTMLButtonElement;
-  readonly #follow = () => this.#playIfSeen();
+  readonly #onVisibility = () => this.#playIfVisible();
 
   /** `still` is what the wall shows of this camera, as a first picture until the large one comes. */
-  constructor(camera: Camera, server: Server, actions: LargeViewActions, still?: Picture) {
+  constructor(camera: Camera, server: Server, actions: LargeViewActions, still?: LivePicture) {
     this.camera = camera;
     this.#actions = actions;
     this.#source = new StreamSource(
@@ -50,21 +50,24 @@ export class LargeView {
       camera,
       false,
       new SnapshotSource(server, camera, new Semaphore(1)),
-      this.#sound,
+      this.#audio,
     );
-    this.#picture = new Picture(
+    this.#picture = new LivePicture(
       () => this.#source.unplayable,
       () => this.#showState(),
       true,
     );
     if (still?.hasPicture) this.#picture.showStill(still.canvas);
     this.#back = iconButton("back", "Back to all cameras", () => actions.back(), "Esc");
-    this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundWord);
+    this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundLabel);
     this.#soundButton.addEventListener("click", () => this.toggleSound());
+    const stepButtons = [
+      iconButton("previous", "Previous camera", () => actions.step?.(-1), "←"),
+      iconButton("next", "Next camera", () => actions.step?.(1), "→"),
+    ];
     const buttons = [
       this.#soundButton,
-      iconButton("previous", "Previous camera", () => actions.step(-1), "←"),
-      iconButton("next", "Next camera", () => actions.step(1), "→"),
+      ...(actions.step ? stepButtons : []),
       iconButton("snapshot", "Snapshot", () => actions.snapshot(), "S"),
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
     ];
@@ -79,8 +82,8 @@ export class LargeView {
       element("div", { class: "large-buttons" }, ...buttons),
     );
     this.root = element("section", { class: "large", "aria-label": camera.name }, bar, this.#picture.root);
-    document.addEventListener("visibilitychange", this.#follow);
-    this.#playIfSeen();
+    document.addEventListener("visibilitychange", this.#onVisibility);
+    this.#playIfVisible();
     this.#picture.refresh();
   }
 
@@ -95,25 +98,25 @@ export class LargeView {
   }
 
   close(): void {
-    document.removeEventListener("visibilitychange", this.#follow);
+    document.removeEventListener("visibilitychange", this.#onVisibility);
     this.#picture.feed.stop();
-    this.#sound.switchOff();
+    this.#audio.switchOff();
     this.root.remove();
   }
 
-  /** Does what the key asks for; false for a key that means nothing here. */
-  key(event: KeyboardEvent): boolean {
+  /** Does what the key asks for; returns false for one that means nothing here. */
+  pressKey(event: KeyboardEvent): boolean {
     switch (event.key.toLowerCase()) {
       case "escape":
         this.#actions.back();
         return true;
       case "arrowleft":
       case "arrowup":
-        this.#actions.step(-1);
+        this.#actions.step?.(-1);
         return true;
       case "arrowright":
       case "arrowdown":
-        this.#actions.step(1);
+        this.#actions.step?.(1);
         return true;
       case "s":
         this.#actions.snapshot();
@@ -131,12 +134,12 @@ export class LargeView {
 
   /** Call it while the user clicks or presses a key. */
   toggleSound(): void {
-    if (this.#sound.trouble) notify(`${this.#sound.trouble}.`);
-    if (this.#sound.isOn) this.#sound.switchOff();
-    else void this.#sound.switchOn();
+    if (this.#audio.error) notify(`${this.#audio.error}.`);
+    if (this.#audio.isOn) this.#audio.switchOff();
+    else void this.#audio.switchOn();
   }
 
-  #playIfSeen(): void {
+  #playIfVisible(): void {
     if (document.hidden) this.#picture.feed.stop();
     else this.#picture.feed.play(this.#source);
   }
@@ -144,18 +147,18 @@ export class LargeView {
   #showState(): void {
     const state = this.#picture.state();
     this.root.dataset["state"] = state.kind;
-    const everyMs = this.#picture.feed.source?.everyMs;
-    setText(this.#state, state.kind === "unavailable" ? "not available" : sentenceOf(state, everyMs));
+    const pollIntervalMs = this.#picture.feed.source?.pollIntervalMs;
+    setText(this.#state, state.kind === "unavailable" ? "not available" : signalText(state, pollIntervalMs));
     setText(this.#description, this.#picture.description());
-    if (this.#source.unplayable && this.#sound.isOn) this.#sound.switchOff();
+    if (this.#source.unplayable && this.#audio.isOn) this.#audio.switchOff();
     this.#showSound();
   }
 
   #showSound(): void {
-    const { exists, isOn, trouble } = this.#sound;
+    const { exists, isOn, error } = this.#audio;
     this.#soundButton.hidden = !exists || this.#source.unplayable !== null;
     this.#soundButton.setAttribute("aria-pressed", String(isOn));
-    this.#soundButton.title = trouble || `Turn the sound ${isOn ? "off" : "on"} (M)`;
-    setText(this.#soundWord, trouble ? "No sound" : isOn ? "Sound on" : "Sound off");
+    this.#soundButton.title = error || `Turn the sound ${isOn ? "off" : "on"} (M)`;
+    setText(this.#soundLabel, error ? "No sound" : isOn ? "Sound on" : "Sound off");
   }
 }

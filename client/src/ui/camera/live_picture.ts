@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One camera's picture with the message that lies over it while it is not live; used by the tiles and the large view.
+// One camera's live picture, with the message that lies over it while it is not live; used by tiles and the large view.
 
 import { Feed } from "../../live/feed";
 import type { Unplayable } from "../../live/unplayable";
@@ -8,7 +8,7 @@ import type { SignalState } from "../../live/signal_state";
 import { unplayableHint } from "./unplayable_hint";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
-import { sentenceOf } from "../widgets/text";
+import { signalText } from "../widgets/text";
 
 /** Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. */
 export type PictureState = SignalState | { kind: "unavailable"; reason: string };
@@ -16,7 +16,7 @@ export type PictureState = SignalState | { kind: "unavailable"; reason: string }
 /** An answer of the server that will not change by asking again. */
 const kNoSuchApi = 404;
 
-export class Picture {
+export class LivePicture {
   readonly canvas = element("canvas", { "aria-hidden": "true" });
   readonly feed: Feed;
   readonly root: HTMLElement;
@@ -26,7 +26,7 @@ export class Picture {
   readonly #sentence = element("p", { class: "message-sentence" });
   readonly #reason = element("p", { class: "message-reason" });
   readonly #hint = element("p", { class: "hint", role: "note" });
-  #hinted: Unplayable | null = null;
+  #hintFor: Unplayable | null = null;
   #frames = 0;
   #rateSinceMs = performance.now();
   #framesPerSecond = 0;
@@ -70,7 +70,7 @@ export class Picture {
     return this.root.classList.contains("has-picture");
   }
 
-  /** Draws a picture that is not news: the state stays as it is. */
+  /** Draws a picture that says nothing of the signal: the state stays as it is. */
   showStill(image: ImageBitmap | VideoFrame | HTMLCanvasElement): void {
     draw(this.canvas, image);
     this.root.classList.add("has-picture");
@@ -85,7 +85,7 @@ export class Picture {
       this.#frames = 0;
       this.#rateSinceMs = nowMs;
     }
-    const isStream = this.feed.source?.everyMs === 0;
+    const isStream = this.feed.source?.pollIntervalMs === 0;
     if (this.state().kind !== "live" || !isStream || this.#framesPerSecond === 0) return "";
     return `${this.canvas.width} × ${this.canvas.height} · ${this.#framesPerSecond} fps`;
   }
@@ -93,7 +93,7 @@ export class Picture {
   /** Brings the screen up to date with the clock. */
   refresh(): void {
     const state = this.state();
-    const sentence = state.kind === "unavailable" ? state.reason : sentenceOf(state);
+    const sentence = state.kind === "unavailable" ? state.reason : signalText(state);
     setText(this.#sentence, sentence.charAt(0).toUpperCase() + sentence.slice(1));
     const noStills = "The server has no still pictures of this camera.";
     setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
@@ -105,10 +105,10 @@ export class Picture {
   }
 
   #showHint(unplayable: Unplayable | null): void {
-    if (this.#hinted === unplayable) return;
-    this.#hinted = unplayable;
-    // What can be remedied, the wall says once for all its tiles.
-    const isSaidHere = unplayable && (this.#canLink || !unplayable.remedy);
-    this.#hint.replaceChildren(...(isSaidHere ? unplayableHint(unplayable) : []));
+    if (this.#hintFor === unplayable) return;
+    this.#hintFor = unplayable;
+    // The wall shows a remedy once for all its tiles.
+    const isShownHere = unplayable && (this.#canLink || !unplayable.remedy);
+    this.#hint.replaceChildren(...(isShownHere ? unplayableHint(unplayable) : []));
   }
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells why still pictures are shown in place of a stream, and what the user can do about it.
+// Says why still pictures are shown in place of a stream, and what the user can do about it.
 
 import type { Unplayable } from "../../live/unplayable";
 import { element } from "../widgets/dom";

@@ -36,14 +36,14 @@ export class Calendar {
     const head = element(
       "header",
       { class: "calendar-head" },
-      iconButton("previous", "Month before", () => this.#turn(-1)),
+      iconButton("previous", "Previous month", () => this.#turn(-1)),
       this.#title,
-      iconButton("next", "Month after", () => this.#turn(1)),
+      iconButton("next", "Next month", () => this.#turn(1)),
     );
     this.root = element("section", { class: "calendar", "aria-label": "Days with recordings" }, head, this.#body);
   }
 
-  /** The day that is looked at; its month is shown. */
+  /** Marks the day that the timeline shows, and shows its month. */
   select(unixMs: number): void {
     const day = midnight(unixMs);
     if (day === this.#selectedMs) return;
@@ -56,7 +56,7 @@ export class Calendar {
     const first = new Date(this.#monthMs);
     const start = midnight(this.#monthMs, -((first.getDay() + 6) % 7));
     const cameras = this.#cameras();
-    this.#days.ask(cameras, start, midnight(start, kCells));
+    this.#days.load(cameras, start, midnight(start, kCells));
     setText(this.#title, monthName(this.#monthMs));
     const today = midnight(Date.now());
     this.#cells.forEach((cell, index) => {

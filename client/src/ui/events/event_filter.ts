@@ -8,12 +8,12 @@ import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { kKindNames } from "./event_list";
 
-/** Lanes that still are a timeline; whoever wants more chooses them. */
-const kFirstCameras = 8;
-const kMostCameras = 32;
-const kKey = "lookhaven.events";
+/** As many as the timeline shows without scrolling; the user may choose more. */
+const kDefaultCameras = 8;
+const kMaxCameras = 32;
+const kStorageKey = "lookhaven.events";
 
-interface Kept {
+interface Stored {
   cameras?: number[];
   kinds?: EventKind[];
 }
@@ -30,15 +30,15 @@ export class EventFilter {
 
   constructor(changed: () => void) {
     this.#changed = changed;
-    const kept = read();
-    if (kept.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => kept.kinds!.includes(kind)));
-    if (kept.cameras) this.#chosen = new Set(kept.cameras);
+    const stored = readStored();
+    if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds!.includes(kind)));
+    if (stored.cameras) this.#chosen = new Set(stored.cameras);
     const kinds = kEventKinds.map((kind) => {
       const box = element("input", { type: "checkbox", checked: this.#kinds.has(kind) });
       box.addEventListener("change", () => {
         if (box.checked) this.#kinds.add(kind);
         else this.#kinds.delete(kind);
-        this.#keep();
+        this.#save();
       });
       return element("label", { class: "chip" }, box, element("span", { class: "row-swatch", "data-kind": kind }), kKindNames[kind]);
     });
@@ -58,7 +58,7 @@ export class EventFilter {
   setCameras(cameras: readonly Camera[]): void {
     this.#cameras = cameras;
     if (!cameras.some(({ id }) => this.#chosen.has(id))) {
-      this.#chosen = new Set(cameras.slice(0, kFirstCameras).map(({ id }) => id));
+      this.#chosen = new Set(cameras.slice(0, kDefaultCameras).map(({ id }) => id));
     }
     this.#showCameras();
   }
@@ -74,16 +74,16 @@ export class EventFilter {
     );
   }
 
-  /** Adds a camera that something is to be played of. */
+  /** Adds a camera of which something is to be played. */
   include(camera: number): void {
     if (this.#chosen.has(camera) || !this.#cameras.some(({ id }) => id === camera)) return;
     this.#choose([...this.#chosen, camera]);
   }
 
   #choose(cameras: readonly number[]): void {
-    this.#chosen = new Set(cameras.slice(0, kMostCameras));
+    this.#chosen = new Set(cameras.slice(0, kMaxCameras));
     this.#showCameras();
-    this.#keep();
+    this.#save();
   }
 
   #showCameras(): void {
@@ -95,22 +95,22 @@ export class EventFilter {
           if (box.checked) this.#chosen.add(id);
           else this.#chosen.delete(id);
           this.#summary.textContent = `Cameras · ${this.cameras.length} of ${this.#cameras.length}`;
-          this.#keep();
+          this.#save();
         });
         return element("label", { class: "camera-choice" }, box, element("span", {}, name));
       }),
     );
   }
 
-  #keep(): void {
-    localStorage.setItem(kKey, JSON.stringify({ cameras: [...this.#chosen], kinds: [...this.#kinds] } satisfies Kept));
+  #save(): void {
+    localStorage.setItem(kStorageKey, JSON.stringify({ cameras: [...this.#chosen], kinds: [...this.#kinds] } satisfies Stored));
     this.#changed();
   }
 }
 
-function read(): Kept {
+function readStored(): Stored {
   try {
-    return (JSON.parse(localStorage.getItem(kKey) ?? "{}") as Kept | null) ?? {};
+    return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Stored | null) ?? {};
   } catch {
     return {};
   }

@@ -3,12 +3,12 @@
 // The events and marks of a span as rows, newest first; only the rows on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
-import type { Footage, FootageRef } from "../../wire/recordings";
+import { isSameFootage, type Footage, type FootageRef } from "../../wire/recordings";
 import { element, setText } from "../widgets/dom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 
-/** Rows beyond the edge, so that a short scroll shows no hole. */
-const kSpare = 4;
+/** Rows kept beyond the visible ones, so that scrolling shows no gap. */
+const kOverscanRows = 4;
 
 export const kKindNames: Record<EventKind, string> = {
   continuous: "Continuous",
@@ -28,7 +28,7 @@ export class EventList {
   readonly #resized = new ResizeObserver(() => this.#render());
   #footage: readonly Footage[] = [];
   #selected: FootageRef | null = null;
-  #isSought = false;
+  #mustReveal = false;
   /** The row that the keys move. */
   #at = 0;
 
@@ -47,15 +47,15 @@ export class EventList {
     this.#footage = footage;
     setText(this.#head, head);
     setText(this.#note, note);
-    this.#seek();
+    this.#revealSelected();
     this.#render();
   }
 
   select(selected: FootageRef | null): void {
     if (selected?.id === this.#selected?.id && selected?.kind === this.#selected?.kind) return;
     this.#selected = selected;
-    this.#isSought = true;
-    this.#seek();
+    this.#mustReveal = true;
+    this.#revealSelected();
     this.#render();
   }
 
@@ -67,12 +67,12 @@ export class EventList {
     return parseFloat(getComputedStyle(this.root).getPropertyValue("--row")) || 44;
   }
 
-  /** Scrolls to what was selected last, once: as soon as it is listed. */
-  #seek(): void {
-    const at = this.#isSought ? this.#footage.findIndex((one) => isSame(one, this.#selected)) : -1;
+  /** Scrolls to a new selection once, as soon as it is listed. */
+  #revealSelected(): void {
+    const at = this.#mustReveal ? this.#footage.findIndex((one) => isSameFootage(one, this.#selected)) : -1;
     if (at < 0) return;
-    this.#isSought = false;
-    // The rows that have come since make the room that is scrolled.
+    this.#mustReveal = false;
+    // The new rows must have made room before it can be scrolled to.
     this.#space.style.height = `${this.#footage.length * this.#rowPx}px`;
     this.#reveal(at);
   }
@@ -86,8 +86,8 @@ export class EventList {
   #render(): void {
     const row = this.#rowPx;
     this.#space.style.height = `${this.#footage.length * row}px`;
-    const first = Math.max(0, Math.floor(this.#box.scrollTop / row) - kSpare);
-    const last = Math.min(this.#footage.length, Math.ceil((this.#box.scrollTop + this.#box.clientHeight) / row) + kSpare);
+    const first = Math.max(0, Math.floor(this.#box.scrollTop / row) - kOverscanRows);
+    const last = Math.min(this.#footage.length, Math.ceil((this.#box.scrollTop + this.#box.clientHeight) / row) + kOverscanRows);
     const kept = new Map([...this.#space.children].map((child) => [(child as HTMLElement).dataset["ref"], child]));
     const wanted = this.#footage.slice(first, last).map((one, index) => {
       const old = kept.get(`${one.kind}${one.id}`) as HTMLElement | undefined;
@@ -125,7 +125,7 @@ export class EventList {
     button.disabled = !one.isSaved;
     button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
     button.title = `${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}${one.text ? `\n${one.text}` : ""}`;
-    button.setAttribute("aria-current", String(isSame(one, this.#selected)));
+    button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
   }
 
   #key(event: KeyboardEvent): void {
@@ -141,8 +141,4 @@ export class EventList {
     this.#render();
     this.#space.querySelector<HTMLElement>(`[data-at="${this.#at}"] button`)?.focus({ preventScroll: true });
   }
-}
-
-function isSame(one: FootageRef, other: FootageRef | null): boolean {
-  return one.id === other?.id && one.kind === other.kind;
 }

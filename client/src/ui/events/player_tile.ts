@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One player on the stage: its picture, whose it is and of when, and what is the matter when there is no picture.
+// One player on the stage: its picture with camera and time, and the reason where there is no picture.
 
 import type { Player, PlayerState } from "../../playback/player";
 import { draw, element, setText } from "../widgets/dom";
@@ -15,12 +15,12 @@ export class PlayerTile {
   readonly #sentence = element("p", { class: "message-sentence", role: "status" });
   readonly #again = element("button", { type: "button", class: "button" });
 
-  /** `onAgain` is the user's wish to play what has stopped. */
+  /** `onAgain` is called when the user wants to play what has stopped. */
   constructor(name: string, player: Player, onAgain: () => void) {
     this.#player = player;
     player.show = async ({ jpeg }, signal) => {
       const image = await createImageBitmap(jpeg);
-      // A pause while it was decoded holds the frame before, which is the one that the player tells.
+      // A pause while it was being decoded keeps the previous frame, whose number the player reports.
       if (!signal.aborted) {
         draw(this.#canvas, image);
         this.root.classList.add("has-picture");
@@ -42,11 +42,11 @@ export class PlayerTile {
     this.refresh(null);
   }
 
-  /** `playheadMs` is the time of which there is nothing. */
+  /** `playheadMs` is named where nothing was recorded then. */
   refresh(playheadMs: number | null): void {
     const { state, footage, timeMs } = this.#player;
     this.root.dataset["state"] = state.kind;
-    // A picture of another time must not pass for this one.
+    // A picture of another time must not be taken for this one.
     if (state.kind === "empty") this.root.classList.remove("has-picture");
     setText(this.#time, footage ? `${shortDate(timeMs)} ${clockTime(timeMs)}` : "");
     setText(this.#sentence, sentenceFor(state, playheadMs));
@@ -64,7 +64,7 @@ function sentenceFor(state: PlayerState, playheadMs: number | null): string {
     case "failed":
       return state.reason;
     case "preempted":
-      return "The server has stopped this player. Another window of this session is probably playing.";
+      return "Playback was stopped because another window of this session started playing.";
     default:
       return "";
   }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The controls below the stage: play, step, rate, what is playing, download.
+// The transport controls below the stage: play, step, rate, what is playing, download.
 
 import { kRates } from "../../playback/player";
 import type { SyncPlayback } from "../../playback/sync_playback";
@@ -13,7 +13,7 @@ import { clockTime, rateText, shortDate } from "../widgets/text";
 export interface TransportActions {
   toggle(): void;
   step(by: number): void;
-  /** To the event before or after. */
+  /** To the previous (-1) or next (1) event. */
   skip(by: 1 | -1): void;
   rate(rate: number): void;
   now(): void;
@@ -25,14 +25,14 @@ export class Transport {
   readonly #playback: SyncPlayback;
   readonly #recordings: Recordings;
   readonly #play: HTMLButtonElement;
-  readonly #rate = element("select", { class: "rate", "aria-label": "Rate", title: "Rate ([ and ])" });
+  readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
   readonly #time = element("time", { class: "transport-time" });
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing", hidden: true }, "recording");
   readonly #download = element("a", { class: "icon-button", "aria-label": "Download this recording", title: "Download this recording" });
 
-  constructor(deck: SyncPlayback, recordings: Recordings, actions: TransportActions) {
-    this.#playback = deck;
+  constructor(playback: SyncPlayback, recordings: Recordings, actions: TransportActions) {
+    this.#playback = playback;
     this.#recordings = recordings;
     this.#play = iconButton("play", "Play", () => actions.toggle(), "Space");
     this.#play.classList.add("play");
@@ -43,18 +43,18 @@ export class Transport {
     const buttons = element(
       "div",
       { class: "transport-buttons", role: "group", "aria-label": "Playback" },
-      iconButton("eventBefore", "Event before", () => actions.skip(-1), "↑"),
-      iconButton("stepBack", "One frame back", () => actions.step(-1), "←"),
+      iconButton("eventBefore", "Previous event", () => actions.skip(-1), "↑"),
+      iconButton("stepBack", "Previous frame", () => actions.step(-1), "←"),
       this.#play,
-      iconButton("stepForward", "One frame on", () => actions.step(1), "→"),
-      iconButton("eventAfter", "Event after", () => actions.skip(1), "↓"),
+      iconButton("stepForward", "Next frame", () => actions.step(1), "→"),
+      iconButton("eventAfter", "Next event", () => actions.skip(1), "↓"),
       this.#rate,
     );
     const about = element("div", { class: "transport-about" }, this.#time, this.#growing, this.#frame);
     const side = element(
       "div",
       { class: "transport-side" },
-      iconButton("now", "To the present", () => actions.now()),
+      iconButton("now", "Go to now", () => actions.now()),
       this.#download,
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
     );

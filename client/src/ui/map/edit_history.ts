@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The steps of an editor: back, forth, and whether there is anything to save. A step is a whole state, never changed.
+// Undo, redo, and whether there is anything to save. Each step is a whole state, which is never modified.
 
-const kMostSteps = 200;
+const kMaxSteps = 200;
 
 export class EditHistory<State> {
   #steps: State[];
@@ -30,9 +30,9 @@ export class EditHistory<State> {
     return this.#at + 1 < this.#steps.length;
   }
 
-  /** What was undone before cannot be redone any more. */
+  /** Steps that were undone cannot be redone after this. */
   add(state: State): void {
-    this.#steps = [...this.#steps.slice(0, this.#at + 1), state].slice(-kMostSteps);
+    this.#steps = [...this.#steps.slice(0, this.#at + 1), state].slice(-kMaxSteps);
     this.#at = this.#steps.length - 1;
   }
 
@@ -44,7 +44,7 @@ export class EditHistory<State> {
     if (this.canRedo) this.#at += 1;
   }
 
-  /** `state` is what the server has from now on. */
+  /** The server has this state now. */
   markSaved(state: State): void {
     this.#saved = state;
   }

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What an item on a map is, and what its camera sees just now, beside the item that is pointed at.
+// A card beside the item that is pointed at: what it is, its state, and what its camera sees now.
 
 import { SnapshotSource } from "../../live/snapshot_source";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { draw, element, setText } from "../widgets/dom";
-import { wordFor, type MapItemView } from "./map_item";
+import { kindName, type MapItemView } from "./map_item";
 import { clockTime, shortDate } from "../widgets/text";
 
 export class MapCard {
@@ -37,17 +37,17 @@ export class MapCard {
     if (this.#shown === view && !this.isPinned && !open) return;
     this.hide();
     this.#shown = view;
-    setText(this.#title, view.item.name || wordFor(view.item));
+    setText(this.#title, view.item.name || kindName(view.item));
     const since = sinceS > 0 ? ` since ${shortDate(sinceS * 1000)} ${clockTime(sinceS * 1000)}` : "";
     const state = view.item.kind === "door" || view.item.kind === "io" ? view.state || "state unknown" : "";
-    setText(this.#text, state ? `${wordFor(view.item)}, ${state}${since}` : wordFor(view.item));
+    setText(this.#text, state ? `${kindName(view.item)}, ${state}${since}` : kindName(view.item));
     this.#canvas.hidden = true;
     this.#open.hidden = open === null;
     this.root.classList.toggle("is-pinned", open !== null);
     this.#open.onclick = open;
     this.root.hidden = false;
     this.#placeBeside(view);
-    if (camera) void this.#follow(camera, view);
+    if (camera) void this.#showPicture(camera, view);
   }
 
   hide(): void {
@@ -57,7 +57,7 @@ export class MapCard {
     this.root.hidden = true;
   }
 
-  async #follow(camera: Camera, view: MapItemView): Promise<void> {
+  async #showPicture(camera: Camera, view: MapItemView): Promise<void> {
     const polling = (this.#polling = new AbortController());
     this.#canvas.setAttribute("aria-label", `Picture of ${camera.name}`);
     const source = new SnapshotSource(this.#server, camera, this.#semaphore);

@@ -6,13 +6,14 @@ import type { EditedMap, Emaps, MapItem, Placeable } from "../../wire/emaps";
 import { asServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element } from "../widgets/dom";
+import { conflictBar } from "./conflict_bar";
 import { EditHistory } from "./edit_history";
-import { MapItemForm, turned } from "./map_item_form";
-import { titleOf, type MapItemView } from "./map_item";
+import { makeDraggable } from "./item_drag";
+import { newItem, titleOf, type MapItemView } from "./map_item";
+import { kTurnDegrees, MapItemForm, turned } from "./map_item_form";
 import { MapView } from "./map_view";
 import { notify } from "../widgets/notice";
 
-const kTurnDegrees = 15;
 const kFarStep = 10;
 
 export class MapEditor {
@@ -22,7 +23,7 @@ export class MapEditor {
   readonly #view: MapView<MapItem>;
   readonly #form: MapItemForm;
   readonly #onDone: () => void;
-  readonly #devices = element("select", { "aria-label": "Device to add" });
+  readonly #devices = element("select", { class: "input", "aria-label": "Device to add" });
   readonly #add = element("button", { type: "button", class: "button" }, "Add");
   readonly #hideNames = element("input", { type: "checkbox" });
   readonly #smallItems = element("input", { type: "checkbox" });
@@ -30,9 +31,9 @@ export class MapEditor {
   readonly #undo = iconButton("undo", "Undo", () => this.#step("undo"), "Ctrl Z");
   readonly #redo = iconButton("redo", "Redo", () => this.#step("redo"), "Ctrl Y");
   readonly #conflict: HTMLElement;
-  readonly #onKey = (event: KeyboardEvent) => this.#key(event);
+  readonly #onKey = (event: KeyboardEvent) => this.#pressKey(event);
   readonly #onLeave = (event: BeforeUnloadEvent) => this.isChanged && event.preventDefault();
-  /** Of what the server has; the steps know nothing of it. */
+  /** Of the map on the server that the changes are based on. */
   #revision: number;
   #placeable: Placeable[] = [];
   #selected = -1;
@@ -48,12 +49,15 @@ export class MapEditor {
       (item) => this.#change(item),
       () => this.#remove(),
     );
-    this.#conflict = this.#conflictBar();
+    this.#conflict = conflictBar(
+      () => void this.#takeTheirs(),
+      () => void this.save(true),
+    );
     this.root = element("div", { class: "map-editor" }, this.#toolbar(), this.#conflict, this.#body());
     this.#add.addEventListener("click", () => this.#place());
     this.#save.addEventListener("click", () => void this.save());
     for (const box of [this.#hideNames, this.#smallItems]) box.addEventListener("change", () => this.#setFlags());
-    // Before the view moves itself by the same keys.
+    // Before the view pans by the same keys.
     document.addEventListener("keydown", this.#onKey, true);
     addEventListener("beforeunload", this.#onLeave);
     void this.#view.showPicture(picture);
@@ -72,7 +76,7 @@ export class MapEditor {
     this.root.remove();
   }
 
-  /** On top of someone else's change where `overwrite` says so; else it is asked. */
+  /** Where someone else has changed the map, asks the user, unless `overwrite`. */
   async save(overwrite = false): Promise<void> {
     this.#save.setAttribute("aria-busy", "true");
     const saving = this.#history.current;
@@ -108,7 +112,7 @@ export class MapEditor {
       ...zoom,
       flag(this.#hideNames, "Hide names"),
       flag(this.#smallItems, "Small icons"),
-      element("span", { class: "map-tools-gap" }),
+      element("span", { class: "bar-gap" }),
       this.#save,
       done,
     );
@@ -126,16 +130,7 @@ export class MapEditor {
     return element("div", { class: "map-editor-body" }, this.#view.root, side);
   }
 
-  #conflictBar(): HTMLElement {
-    const mine = element("button", { type: "button", class: "button" }, "Save mine over it");
-    const theirs = element("button", { type: "button", class: "button" }, "Show theirs");
-    mine.addEventListener("click", () => void this.save(true));
-    theirs.addEventListener("click", () => void this.#takeTheirs());
-    const text = element("p", {}, "Someone else has changed this map since you opened it. Nothing of yours is lost.");
-    return element("div", { class: "map-conflict", role: "alert", hidden: true }, text, theirs, mine);
-  }
-
-  /** A step like any other: Undo brings one's own items back. */
+  /** Undo brings the user's own items back. */
   async #takeTheirs(): Promise<void> {
     try {
       const theirs = await this.#emaps.edit(this.#history.current.id);
@@ -156,7 +151,7 @@ export class MapEditor {
     } catch (error) {
       notify(asServerError(error).message);
     }
-    const label = (one: Placeable) => titleOf({ ...kNewItem, ...one }) + (one.server ? ` (server ${one.server})` : "");
+    const label = (one: Placeable) => titleOf(newItem(one)) + (one.server ? ` (server ${one.server})` : "");
     this.#devices.replaceChildren(
       ...this.#placeable
         .filter((one) => one.kind !== "emap" || one.id !== this.#history.current.id)
@@ -170,7 +165,7 @@ export class MapEditor {
     if (!device) return;
     const box = this.#view.root.getBoundingClientRect();
     const at = this.#view.pictureAt(box.left + box.width / 2, box.top + box.height / 2);
-    this.#setItems([...this.#items, { ...kNewItem, ...device, ...at }]);
+    this.#setItems([...this.#items, { ...newItem(device), ...at }]);
     this.#selectAt(this.#items.length - 1);
   }
 
@@ -200,8 +195,8 @@ export class MapEditor {
     this.#setItems(left);
   }
 
-  #step(way: "undo" | "redo"): void {
-    this.#history[way]();
+  #step(direction: "undo" | "redo"): void {
+    this.#history[direction]();
     if (this.#selected >= this.#items.length) this.#selected = -1;
     this.#show();
   }
@@ -221,7 +216,7 @@ export class MapEditor {
     const { items, hideNames, smallItems } = this.#history.current;
     const hadFocus = this.#view.root.contains(document.activeElement);
     this.#view.showItems(items, { hideNames, smallItems });
-    this.#view.views.forEach((view, at) => view.root.addEventListener("pointerdown", (event) => this.#drag(event, view, at)));
+    this.#view.views.forEach((view, at) => makeDraggable(view, this.#view, () => this.#drop(view, at)));
     this.#hideNames.checked = hideNames;
     this.#smallItems.checked = smallItems;
     this.#form.show(items[this.#selected] ?? null);
@@ -236,34 +231,19 @@ export class MapEditor {
     this.#save.disabled = !this.isChanged;
   }
 
-  /** Moves with the pointer; where it is let go is one step. */
-  #drag(event: PointerEvent, view: MapItemView, at: number): void {
-    if (event.button !== 0) return;
-    event.stopPropagation();
-    view.root.setPointerCapture(event.pointerId);
-    const before = this.#items[at]!;
-    const grip = this.#view.pictureAt(event.clientX, event.clientY);
-    const follow = ({ clientX, clientY }: PointerEvent) => {
-      const now = this.#view.pictureAt(clientX, clientY);
-      view.show({ ...before, x: Math.max(0, before.x + now.x - grip.x), y: Math.max(0, before.y + now.y - grip.y) });
-    };
-    const end = () => {
-      view.root.removeEventListener("pointermove", follow);
-      const { x, y } = view.item;
-      this.#selected = at;
-      if (x !== before.x || y !== before.y) this.#setItems(this.#items.with(at, view.item));
-      this.#selectAt(at);
-    };
-    view.root.addEventListener("pointermove", follow);
-    view.root.addEventListener("lostpointercapture", end, { once: true });
+  #drop(view: MapItemView, at: number): void {
+    const { x, y } = this.#items[at]!;
+    this.#selected = at;
+    if (view.item.x !== x || view.item.y !== y) this.#setItems(this.#items.with(at, view.item));
+    this.#selectAt(at);
   }
 
-  #key(event: KeyboardEvent): void {
+  #pressKey(event: KeyboardEvent): void {
     const key = event.key.toLowerCase();
-    const types = event.target instanceof HTMLInputElement && event.target.type !== "checkbox";
+    const isTyping = event.target instanceof HTMLInputElement && event.target.type !== "checkbox";
     if (event.ctrlKey || event.metaKey) {
       if (key === "s") void (this.isChanged && this.save());
-      else if (types) return;
+      else if (isTyping) return;
       else if (key === "z" && !event.shiftKey) this.#step("undo");
       else if (key === "y" || (key === "z" && event.shiftKey)) this.#step("redo");
       else return;
@@ -273,29 +253,15 @@ export class MapEditor {
     const item = this.#items[at];
     if (!item || event.altKey) return;
     this.#selected = at;
-    const far = event.shiftKey ? kFarStep : 1;
+    const step = event.shiftKey ? kFarStep : 1;
     if (key === "delete" || key === "backspace") this.#remove();
     else if (key === "[") this.#change(turned(item, -kTurnDegrees));
     else if (key === "]") this.#change(turned(item, kTurnDegrees));
-    else if (key === "arrowleft") this.#change({ ...item, x: Math.max(0, item.x - far) });
-    else if (key === "arrowright") this.#change({ ...item, x: item.x + far });
-    else if (key === "arrowup") this.#change({ ...item, y: Math.max(0, item.y - far) });
-    else if (key === "arrowdown") this.#change({ ...item, y: item.y + far });
+    else if (key === "arrowleft") this.#change({ ...item, x: Math.max(0, item.x - step) });
+    else if (key === "arrowright") this.#change({ ...item, x: item.x + step });
+    else if (key === "arrowup") this.#change({ ...item, y: Math.max(0, item.y - step) });
+    else if (key === "arrowdown") this.#change({ ...item, y: item.y + step });
     else return;
     event.preventDefault();
   }
 }
-
-const kNewItem: MapItem = {
-  kind: "camera",
-  id: 0,
-  server: 0,
-  name: "",
-  x: 0,
-  y: 0,
-  direction: 0,
-  textPos: 0,
-  iconCenterX: 0,
-  iconCenterY: 0,
-  port: -1,
-};

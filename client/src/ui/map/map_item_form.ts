@@ -1,14 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The numbers and the name of the item that is selected in the map editor.
+// Name, position and direction of the item that is selected in the map editor.
 
 import type { MapItem } from "../../wire/emaps";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { titleOf } from "./map_item";
 
-const kTurnDegrees = 15;
-const kTextPlaces = ["Below", "Above", "Left", "Right"];
+/** Of one press of the button or key. */
+export const kTurnDegrees = 15;
+const kTextPositions = ["Below", "Above", "Left", "Right"];
 
 export function turned(item: MapItem, by: number): MapItem {
   return { ...item, direction: (item.direction + by + 360) % 360 };
@@ -17,15 +18,15 @@ export function turned(item: MapItem, by: number): MapItem {
 export class MapItemForm {
   readonly root: HTMLElement;
   readonly #title = element("h2", { class: "map-form-title" });
-  readonly #name = element("input", { type: "text", maxlength: "80", autocomplete: "off" });
+  readonly #name = element("input", { class: "input", type: "text", maxlength: "80", autocomplete: "off" });
   readonly #numbers: Record<"x" | "y" | "direction", HTMLInputElement>;
-  readonly #textPos = element("select", {}, ...kTextPlaces.map((name, at) => element("option", { value: String(at) }, name)));
+  readonly #textPos = element("select", { class: "input" }, ...kTextPositions.map((name, at) => element("option", { value: String(at) }, name)));
   readonly #onChange: (item: MapItem) => void;
   #item: MapItem | null = null;
 
   constructor(onChange: (item: MapItem) => void, onRemove: () => void) {
     this.#onChange = onChange;
-    const number = (most: string) => element("input", { type: "number", min: "0", max: most, step: "1", required: true });
+    const number = (max: string) => element("input", { class: "input", type: "number", min: "0", max, step: "1", required: true });
     this.#numbers = { x: number("100000"), y: number("100000"), direction: number("359") };
     const row = (label: string, field: HTMLElement) => element("label", { class: "map-field" }, label, field);
     const turn = (by: number) => () => this.#item && onChange(turned(this.#item, by));
@@ -34,7 +35,7 @@ export class MapItemForm {
       { class: "map-form", hidden: true },
       this.#title,
       row("Name", this.#name),
-      row("Name stands", this.#textPos),
+      row("Name at", this.#textPos),
       row("x", this.#numbers.x),
       row("y", this.#numbers.y),
       row("Direction °", this.#numbers.direction),
@@ -43,7 +44,7 @@ export class MapItemForm {
         { class: "map-form-buttons" },
         iconButton("turnLeft", "Turn left", turn(-kTurnDegrees), "["),
         iconButton("turnRight", "Turn right", turn(kTurnDegrees), "]"),
-        iconButton("remove", "Take it off the map", onRemove, "Del"),
+        iconButton("remove", "Remove from the map", onRemove, "Del"),
       ),
     );
     for (const field of [this.#name, this.#textPos, ...Object.values(this.#numbers)]) {

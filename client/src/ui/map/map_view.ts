@@ -1,34 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A map's picture with its items, to be zoomed and moved with wheel, fingers and keys.
+// A map's picture with its items, zoomed and panned with wheel, fingers and keys.
 //
 // Why so        Items keep their size whatever the zoom, so they lie over the picture and not in it. Where each one lies is
-//               left to the style sheet: of a zoom or a move it gets three numbers, however many items there are.
+//               left to the style sheet, which gets three numbers for each zoom or pan, however many items there are.
 
 import type { MapFlags, MapItem } from "../../wire/emaps";
 import { element } from "../widgets/dom";
+import { panZoomByWheel, PanZoomPointers, type PanZoomActions, type Point } from "../widgets/pan_zoom";
 import { MapItemView } from "./map_item";
 
-const kMostZoom = 8;
+const kMaxScale = 8;
 const kKeyStepPx = 60;
 const kKeyZoom = 1.25;
-/** A finger that moved less than this has tapped. */
-const kTapPx = 5;
 /** Below this zoom names would lie over each other. */
 const kNamesFromScale = 0.5;
-/** A picture that names no size of its own, and the plane where there is none. */
+/** For a picture without a size of its own, and where there is no picture. */
 const kFallbackSize = { width: 1200, height: 800 };
 
 export interface MapViewActions<Item extends MapItem> {
-  /** A click, a tap or the Enter key. */
+  /** A click, a tap, Enter or Space. */
   choose(view: MapItemView, item: Item): void;
   /** Pointer or focus came to the item, or left it (null). */
   point(view: MapItemView | null): void;
-}
-
-interface Point {
-  x: number;
-  y: number;
 }
 
 export class MapView<Item extends MapItem> {
@@ -38,26 +32,25 @@ export class MapView<Item extends MapItem> {
   readonly #items = element("div", { class: "map-items" });
   readonly #actions: MapViewActions<Item>;
   readonly #resize = new ResizeObserver(() => this.#keepWithin());
-  readonly #fingers = new Map<number, Point>();
+  readonly #pointers: PanZoomPointers;
   #views: MapItemView[] = [];
   #url = "";
   #size = kFallbackSize;
   #scale = 1;
   #offset: Point = { x: 0, y: 0 };
-  #fitted = true;
-  #moved = false;
+  #isFitted = true;
 
   constructor(actions: MapViewActions<Item>) {
     this.#actions = actions;
     this.#plane.append(this.#image);
     this.root.append(this.#plane, this.#items);
-    this.root.addEventListener("wheel", (event) => this.#wheel(event), { passive: false });
-    this.root.addEventListener("pointerdown", (event) => this.#down(event));
-    this.root.addEventListener("pointermove", (event) => this.#move(event));
-    for (const end of ["pointerup", "pointercancel"] as const) {
-      this.root.addEventListener(end, (event) => this.#fingers.delete(event.pointerId));
-    }
-    this.root.addEventListener("keydown", (event) => this.#key(event));
+    const panZoom: PanZoomActions = {
+      pan: (xPx, yPx) => this.#pan(xPx, yPx),
+      zoom: (factor, at) => this.#zoomAt(at, factor),
+    };
+    panZoomByWheel(this.root, panZoom);
+    this.#pointers = new PanZoomPointers(this.root, panZoom, "both");
+    this.root.addEventListener("keydown", (event) => this.#pressKey(event));
     this.#resize.observe(this.root);
   }
 
@@ -65,7 +58,7 @@ export class MapView<Item extends MapItem> {
     return this.#views;
   }
 
-  /** Resolves when the picture is there, or turned out to be none (false). */
+  /** Resolves when the picture is shown (true), or cannot be (false). */
   async showPicture(picture: Blob | null): Promise<boolean> {
     URL.revokeObjectURL(this.#url);
     this.#url = picture ? URL.createObjectURL(picture) : "";
@@ -93,9 +86,9 @@ export class MapView<Item extends MapItem> {
     this.root.classList.toggle("has-small-items", flags.smallItems);
     this.#views = items.map((item) => {
       const view = new MapItemView(item);
-      // What ends a drag is no click; a key (detail 0) always is one.
+      // The end of a drag is no click; a key (detail 0) always is one.
       view.root.addEventListener("click", ({ detail }) => {
-        if (!this.#moved || detail === 0) this.#actions.choose(view, view.item as Item);
+        if (!this.#pointers.hasMoved || detail === 0) this.#actions.choose(view, view.item as Item);
       });
       view.root.addEventListener("pointerenter", (event) => event.pointerType === "mouse" && this.#actions.point(view));
       view.root.addEventListener("pointerleave", () => this.#actions.point(null));
@@ -115,7 +108,7 @@ export class MapView<Item extends MapItem> {
 
   /** The whole picture, as large as it fits. */
   fit(): void {
-    this.#fitted = true;
+    this.#isFitted = true;
     this.#scale = this.#fitScale();
     const { clientWidth, clientHeight } = this.root;
     this.#offset = {
@@ -133,7 +126,7 @@ export class MapView<Item extends MapItem> {
   /** Where on the picture a point of the window lies, in whole pixels and within the picture. */
   pictureAt(clientX: number, clientY: number): Point {
     const box = this.root.getBoundingClientRect();
-    const clamp = (value: number, most: number) => Math.round(Math.min(Math.max(value, 0), most));
+    const clamp = (value: number, max: number) => Math.round(Math.min(Math.max(value, 0), max));
     return {
       x: clamp((clientX - box.left - this.#offset.x) / this.#scale, this.#size.width),
       y: clamp((clientY - box.top - this.#offset.y) / this.#scale, this.#size.height),
@@ -146,23 +139,23 @@ export class MapView<Item extends MapItem> {
   }
 
   #zoomAt(at: Point, by: number): void {
-    const least = this.#fitScale();
-    const scale = Math.min(Math.max(this.#scale * by, least), Math.max(kMostZoom, least));
-    const grown = scale / this.#scale;
-    this.#offset = { x: at.x - (at.x - this.#offset.x) * grown, y: at.y - (at.y - this.#offset.y) * grown };
+    const min = this.#fitScale();
+    const scale = Math.min(Math.max(this.#scale * by, min), Math.max(kMaxScale, min));
+    const growth = scale / this.#scale;
+    this.#offset = { x: at.x - (at.x - this.#offset.x) * growth, y: at.y - (at.y - this.#offset.y) * growth };
     this.#scale = scale;
-    this.#fitted = scale <= least;
+    this.#isFitted = scale <= min;
     this.#keepWithin();
   }
 
-  #shift(x: number, y: number): void {
+  #pan(x: number, y: number): void {
     this.#offset = { x: this.#offset.x + x, y: this.#offset.y + y };
     this.#keepWithin();
   }
 
   /** The picture stays in the window: in the middle where it is smaller, without a gap where it is larger. */
   #keepWithin(): void {
-    if (this.#fitted) return this.fit();
+    if (this.#isFitted) return this.fit();
     const within = (offset: number, room: number, size: number) =>
       size <= room ? (room - size) / 2 : Math.min(0, Math.max(room - size, offset));
     this.#offset = {
@@ -181,39 +174,7 @@ export class MapView<Item extends MapItem> {
     this.root.classList.toggle("is-far", this.#scale < kNamesFromScale);
   }
 
-  #wheel(event: WheelEvent): void {
-    event.preventDefault();
-    const box = this.root.getBoundingClientRect();
-    const lines = event.deltaMode === WheelEvent.DOM_DELTA_LINE ? 16 : 1;
-    this.#zoomAt({ x: event.clientX - box.left, y: event.clientY - box.top }, Math.exp(-event.deltaY * lines * 0.0015));
-  }
-
-  #down(event: PointerEvent): void {
-    if (event.button !== 0) return;
-    // One that was let go outside of the window was never seen to end.
-    if (event.isPrimary) this.#fingers.clear();
-    this.#moved = this.#fingers.size > 0;
-    this.#fingers.set(event.pointerId, { x: event.clientX, y: event.clientY });
-  }
-
-  #move(event: PointerEvent): void {
-    const before = this.#fingers.get(event.pointerId);
-    if (!before) return;
-    if (!this.#moved && Math.hypot(event.clientX - before.x, event.clientY - before.y) < kTapPx) return;
-    if (!this.#moved) this.root.setPointerCapture(event.pointerId);
-    this.#moved = true;
-    const other = [...this.#fingers].find(([id]) => id !== event.pointerId)?.[1];
-    const now = { x: event.clientX, y: event.clientY };
-    this.#fingers.set(event.pointerId, now);
-    if (!other) return this.#shift(now.x - before.x, now.y - before.y);
-    const box = this.root.getBoundingClientRect();
-    const middle = { x: (now.x + other.x) / 2 - box.left, y: (now.y + other.y) / 2 - box.top };
-    const apart = (one: Point) => Math.max(1, Math.hypot(one.x - other.x, one.y - other.y));
-    this.#zoomAt(middle, apart(now) / apart(before));
-    this.#shift((now.x - before.x) / 2, (now.y - before.y) / 2);
-  }
-
-  #key(event: KeyboardEvent): void {
+  #pressKey(event: KeyboardEvent): void {
     if (event.defaultPrevented || event.altKey || event.ctrlKey || event.metaKey) return;
     const steps: Record<string, [number, number]> = {
       ArrowLeft: [kKeyStepPx, 0],
@@ -222,7 +183,7 @@ export class MapView<Item extends MapItem> {
       ArrowDown: [0, -kKeyStepPx],
     };
     const step = steps[event.key];
-    if (step) this.#shift(...step);
+    if (step) this.#pan(...step);
     else if (event.key === "+" || event.key === "=") this.zoom(kKeyZoom);
     else if (event.key === "-") this.zoom(1 / kKeyZoom);
     else if (event.key === "0") this.fit();

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The login screen.
+// The log-in screen.
 
 import { ServerError, type Account, type Server } from "../../wire/server";
 import { element } from "../widgets/dom";
@@ -49,6 +49,6 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
 }
 
 function field(name: string, label: string, attributes: Record<string, string>) {
-  const input = element("input", { id: name, name, ...attributes });
+  const input = element("input", { class: "input", id: name, name, ...attributes });
   return { input, row: element("label", { class: "field", for: name }, element("span", {}, label), input) };
 }

@@ -1,67 +1,48 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One e-map at a time: its picture with what is placed on it, and over it a camera that was opened there.
+// One e-map at a time: its picture with what is placed on it, its editor, and over it a camera that was opened there.
 
-import { Emaps, type DeviceState, type EditedMap, type MapName, type SeenItem, type SeenMap } from "../../wire/emaps";
-import { asServerError, type Account, type Camera, type Server } from "../../wire/server";
-import { iconButton } from "../widgets/button";
-import { element, setText } from "../widgets/dom";
-import { toggleFullScreen } from "../widgets/full_screen";
-import { icon } from "../widgets/icons";
-import { LargeView } from "../camera/large_view";
+import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem, type ViewerMap } from "../../wire/emaps";
+import { asServerError, type Camera } from "../../wire/server";
+import { CameraOverlay } from "../camera/camera_overlay";
 import { MapCard } from "../map/map_card";
 import { MapEditor } from "../map/map_editor";
 import type { MapItemView } from "../map/map_item";
 import { MapView } from "../map/map_view";
-import { navigation } from "./navigation";
+import { iconButton } from "../widgets/button";
+import { element, setText } from "../widgets/dom";
 import { notify } from "../widgets/notice";
-import { leaveMapCamera, replaceRoute, openMap, showMap } from "./route";
-import { logoutButton } from "./log_out";
-import { SnapshotDialog } from "../camera/snapshot_dialog";
-import { clockTime } from "../widgets/text";
+import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
+import { Screen, type Session } from "./screen";
 
-const kTickMs = 500;
-const kStatesEveryMs = 3_000;
+const kRefreshMs = 500;
+const kStatesIntervalMs = 3_000;
 
-export class MapsScreen {
-  readonly root: HTMLElement;
-  readonly #server: Server;
-  readonly #emaps: Emaps;
-  readonly #card: MapCard;
-  readonly #view: MapView<SeenItem>;
-  readonly #dialog: SnapshotDialog;
-  readonly #front: HTMLElement;
+export class MapsScreen extends Screen {
+  readonly #emaps = new Emaps(this.server);
+  readonly #overlay = new CameraOverlay(this.server, this.root, this.front, { back: leaveMapCamera });
+  readonly #card = new MapCard(this.server);
+  readonly #view: MapView<ViewerItem>;
   readonly #stage = element("div", { class: "map-stage" });
-  readonly #names = element("select", { class: "map-names", "aria-label": "Map" });
+  readonly #names = element("select", { class: "map-names input", "aria-label": "Map" });
   readonly #message = element("p", { class: "map-message", role: "status", hidden: true });
-  readonly #clock = element("time", { class: "wall-clock" });
-  readonly #progress = element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" });
   readonly #tools: HTMLElement;
   readonly #edit: HTMLButtonElement;
-  readonly #onRoute = () => void this.#followRoute();
-  readonly #onKey = (event: KeyboardEvent) => this.#key(event);
-  readonly #tick = setInterval(() => this.#refresh(), kTickMs);
-  readonly #statesTimer = setInterval(() => void this.#loadStates(), kStatesEveryMs);
   #maps: MapName[] = [];
   #cameras: Camera[] = [];
   #states: DeviceState[] = [];
-  #map: { id: number; seen: SeenMap } | null = null;
+  #map: { id: number; content: ViewerMap } | null = null;
   #editor: MapEditor | null = null;
-  #large: LargeView | null = null;
-  #closed = false;
 
-  constructor(server: Server, account: Account, onLogout: () => void) {
-    this.#server = server;
-    this.#emaps = new Emaps(server);
-    this.#dialog = new SnapshotDialog(server);
-    this.#card = new MapCard(server);
-    this.#view = new MapView<SeenItem>({
+  constructor(session: Session) {
+    super("maps", session);
+    this.#view = new MapView<ViewerItem>({
       choose: (view, item) => this.#choose(view, item),
       point: (view) => this.#point(view),
     });
-    this.#names.addEventListener("change", () => this.#leaveEditor(() => showMap(Number(this.#names.value))));
+    this.#names.addEventListener("change", () => this.#chooseMap(Number(this.#names.value)));
     this.#edit = iconButton("edit", "Edit the map", () => void this.#openEditor(), "E");
-    this.#edit.hidden = !account.is_manager;
+    this.#edit.hidden = !session.account.is_manager;
     this.#tools = element(
       "div",
       { class: "segments" },
@@ -70,91 +51,98 @@ export class MapsScreen {
       iconButton("fit", "The whole map", () => this.#view.fit(), "0"),
       this.#edit,
     );
-    const busy = (isBusy: boolean) => (this.#progress.hidden = !isBusy);
-    const bar = element(
-      "header",
-      { class: "bar" },
-      element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven")),
-      navigation("maps"),
-      this.#names,
-      element("span", { class: "map-tools-gap" }),
-      this.#tools,
-      this.#clock,
-      logoutButton(server, account, onLogout, busy),
-    );
+    this.addToBar(this.#names, element("span", { class: "bar-gap" }), this.#tools);
     this.#stage.append(this.#view.root, this.#card.root, this.#message);
-    this.#front = element("div", { class: "wall maps" }, bar, this.#progress, this.#stage);
-    this.root = element("main", { class: "screen" }, this.#front, this.#dialog.root);
-    addEventListener("popstate", this.#onRoute);
-    document.addEventListener("keydown", this.#onKey);
-    this.#refresh();
+    this.front.append(this.#stage);
+    this.every(kRefreshMs, () => this.#overlay.refresh());
+    this.every(kStatesIntervalMs, () => void this.#loadStates());
     void this.#start();
   }
 
-  close(): void {
-    this.#closed = true;
-    clearInterval(this.#tick);
-    clearInterval(this.#statesTimer);
-    removeEventListener("popstate", this.#onRoute);
-    document.removeEventListener("keydown", this.#onKey);
-    if (this.#dialog.isOpen) this.#dialog.root.close();
+  override close(): void {
+    super.close();
     this.#card.hide();
     this.#editor?.close();
-    this.#large?.close();
+    this.#overlay.close();
     this.#view.close();
+  }
+
+  /** Asks first where changes would be lost. */
+  override canLeave(): boolean {
+    return !this.#editor?.isChanged || confirm("Leave without saving your changes to this map?");
+  }
+
+  followRoute(): boolean {
+    const open = openMap();
+    if (!open || this.#maps.length === 0) return true;
+    if (this.#map?.id === open.map) this.#showCamera(open.camera);
+    else if (this.#leaveEditor()) void this.#goTo(open.map);
+    else return false;
+    return true;
+  }
+
+  protected pressKey(event: KeyboardEvent): boolean {
+    const isDone = this.#overlay.pressKey(event);
+    if (isDone !== undefined) return isDone;
+    if (event.key === "Escape" && this.#card.isPinned) this.#card.hide();
+    else if (event.key.toLowerCase() === "e" && !this.#edit.hidden && !this.#editor) void this.#openEditor();
+    else return false;
+    return true;
   }
 
   async #start(): Promise<void> {
     try {
-      const [maps, cameras] = await Promise.all([this.#emaps.list(), this.#server.cameras()]);
-      if (this.#closed) return;
+      const [maps, cameras] = await Promise.all([this.#emaps.list(), this.server.cameras()]);
+      if (this.closed.aborted) return;
       this.#maps = maps;
       this.#cameras = cameras.camera ?? [];
       this.#names.replaceChildren(...maps.map(({ id, name }) => element("option", { value: String(id) }, name)));
       this.#names.hidden = this.#tools.hidden = maps.length === 0;
-      if (maps.length === 0) return this.#say("There are no maps yet. An administrator adds one with lookhaven emap add.");
+      if (maps.length === 0) {
+        return this.#showMessage("There are no maps yet. An administrator adds one with lookhaven emap add.");
+      }
       if (openMap() === null) replaceRoute(maps[0]!.id);
-      await this.#followRoute();
+      this.followRoute();
     } catch (error) {
-      this.#say(asServerError(error).message);
+      this.#showMessage(asServerError(error).message);
     }
   }
 
-  async #followRoute(): Promise<void> {
+  async #goTo(id: number): Promise<void> {
+    await this.#load(id);
     const open = openMap();
-    if (!open || this.#maps.length === 0) return;
-    if (this.#map?.id !== open.map) await this.#load(open.map);
-    if (!this.#closed && openMap()?.map === open.map) this.#showCamera(openMap()?.camera ?? null);
+    if (!this.closed.aborted && open?.map === id) this.#showCamera(open.camera);
   }
 
   async #load(id: number): Promise<void> {
     this.#card.hide();
-    this.#closeEditor();
-    this.#progress.hidden = false;
+    this.progress.hidden = false;
     this.#names.value = String(id);
     try {
-      const seen = await this.#emaps.open(id);
-      if (this.#closed || openMap()?.map !== id) return;
-      this.#map = { id, seen };
+      const content = await this.#emaps.open(id);
+      if (this.closed.aborted || openMap()?.map !== id) return;
+      this.#map = { id, content };
       this.#states = [];
-      this.#say("");
-      this.#view.showItems(seen.items, seen);
-      if (!(await this.#view.showPicture(seen.picture))) this.#say("The map's picture cannot be shown.");
+      this.#showMessage("");
+      this.#view.showItems(content.items, content);
+      if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
       void this.#loadStates();
     } catch (error) {
       const { status, message } = asServerError(error);
       this.#map = null;
       this.#view.showItems([], { hideNames: false, smallItems: false });
       void this.#view.showPicture(null);
-      this.#say(status === 502 ? "There is no such map, or you may not see it." : message);
+      this.#showMessage(
+        status === 502 ? "This map does not exist, or you do not have permission to view it." : message,
+      );
     } finally {
-      this.#progress.hidden = true;
+      this.progress.hidden = true;
     }
   }
 
   async #loadStates(): Promise<void> {
     const map = this.#map;
-    if (!map || this.#editor || document.hidden || this.#closed) return;
+    if (!map || this.#editor || document.hidden || this.closed.aborted) return;
     const states = await this.#emaps.states(map.id).catch(() => null);
     if (!states || this.#map !== map) return;
     this.#states = states;
@@ -170,7 +158,7 @@ export class MapsScreen {
 
   /** Null where it has none, or none that the user may watch. */
   #cameraOf(view: MapItemView): Camera | null {
-    const item = view.item as SeenItem;
+    const item = view.item as ViewerItem;
     const watching = this.#stateOf(view)?.camera ?? 0;
     const wanted = item.camera ?? (watching > 0 ? { id: watching, server: 0 } : null);
     return wanted && this.#find(wanted);
@@ -178,17 +166,22 @@ export class MapsScreen {
 
   #find({ id, server }: Pick<Camera, "id" | "server">): Camera | null {
     if (!server) return this.#cameras.find((camera) => camera.id === id) ?? null;
-    const item = this.#map?.seen.items.find((one) => one.kind === "camera" && one.id === id && one.server === server);
+    const item = this.#map?.content.items.find((one) => one.kind === "camera" && one.id === id && one.server === server);
     if (!item) return null;
     return { id, server, name: item.name, video_type: item.videoType, liveview_port: 0, cam_ptz: 0, sound_support: 1 };
   }
 
-  #choose(view: MapItemView, item: SeenItem): void {
+  #chooseMap(id: number): void {
+    if (this.#leaveEditor()) showMap(id);
+    else this.#names.value = String(this.#map?.id ?? "");
+  }
+
+  #choose(view: MapItemView, item: ViewerItem): void {
     const map = this.#map?.id ?? 0;
     if (item.kind === "emap") return showMap(item.id);
     const camera = this.#cameraOf(view);
     if (item.kind === "camera" && item.port < 0) {
-      return camera ? showMap(map, camera) : notify(`${item.name} is switched off.`);
+      return camera ? showMap(map, camera) : notify(`${item.name} is disabled.`);
     }
     const open = camera && (() => showMap(map, camera));
     this.#card.show(view, camera, this.#stateOf(view)?.since ?? 0, open);
@@ -203,22 +196,8 @@ export class MapsScreen {
   #showCamera(wanted: Pick<Camera, "id" | "server"> | null): void {
     const camera = wanted && this.#find(wanted);
     if (wanted && !camera) return leaveMapCamera();
-    const shown = this.#large?.camera;
-    if (shown && camera && shown.id === camera.id && (shown.server ?? 0) === (camera.server ?? 0)) return;
-    this.#large?.close();
-    this.#large = null;
-    this.#front.hidden = camera !== null;
     this.#card.hide();
-    if (!camera) return;
-    this.#large = new LargeView(camera, this.#server, {
-      back: leaveMapCamera,
-      step: () => undefined,
-      snapshot: () => void this.#dialog.take(camera),
-      fullScreen: toggleFullScreen,
-    });
-    this.#large.root.classList.add("from-map");
-    this.root.prepend(this.#large.root);
-    this.#large.focus();
+    this.#overlay.show(camera);
   }
 
   async #openEditor(): Promise<void> {
@@ -230,49 +209,27 @@ export class MapsScreen {
     } catch (error) {
       return notify(asServerError(error).message);
     }
-    if (this.#map !== map || this.#editor || this.#closed) return;
+    if (this.#map !== map || this.#editor || this.closed.aborted) return;
     this.#card.hide();
-    this.#editor = new MapEditor(this.#emaps, edited, map.seen.picture, () =>
-      this.#leaveEditor(() => void this.#load(map.id)),
-    );
+    this.#editor = new MapEditor(this.#emaps, edited, map.content.picture, () => {
+      if (this.#leaveEditor()) void this.#load(map.id);
+    });
     this.#view.root.hidden = this.#tools.hidden = true;
     this.#stage.prepend(this.#editor.root);
   }
 
-  /** Asks first where something would be lost. */
-  #leaveEditor(then: () => void): void {
-    if (this.#editor?.isChanged && !confirm("Leave without saving your changes to this map?")) {
-      this.#names.value = String(this.#map?.id ?? "");
-      return;
-    }
-    this.#closeEditor();
-    then();
-  }
-
-  #closeEditor(): void {
+  /** False where the user would rather go on editing. */
+  #leaveEditor(): boolean {
+    if (!this.canLeave()) return false;
     this.#editor?.close();
     this.#editor = null;
     this.#view.root.hidden = this.#tools.hidden = false;
+    return true;
   }
 
-  #say(sentence: string): void {
-    this.#progress.hidden = true;
+  #showMessage(sentence: string): void {
+    this.progress.hidden = true;
     this.#message.hidden = sentence === "";
     setText(this.#message, sentence);
-  }
-
-  #refresh(): void {
-    this.#large?.refresh();
-    setText(this.#clock, clockTime(Date.now()));
-  }
-
-  #key(event: KeyboardEvent): void {
-    if (this.#dialog.isOpen || event.altKey || event.ctrlKey || event.metaKey || event.defaultPrevented) return;
-    if (this.#large) {
-      if (!this.#large.key(event)) return;
-    } else if (event.key === "Escape" && this.#card.isPinned) this.#card.hide();
-    else if (event.key.toLowerCase() === "e" && !this.#edit.hidden && !this.#editor) void this.#openEditor();
-    else return;
-    event.preventDefault();
   }
 }

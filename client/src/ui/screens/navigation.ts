@@ -1,19 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The way from screen to screen, in the bar of each.
+// The links from screen to screen, in the bar of each.
 
 import { element } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
-import type { Screen } from "./route";
+import type { ScreenName } from "./route";
 
-const kScreens: [Screen, IconName, string, string][] = [
-  ["live", "live", "Live", "#"],
+const kLinks: [ScreenName, IconName, label: string, href: string][] = [
+  ["wall", "live", "Live", "#"],
   ["events", "events", "Events", "#events"],
   ["maps", "map", "Maps", "#maps"],
 ];
 
-export function navigation(current: Screen): HTMLElement {
-  const links = kScreens.map(([screen, name, label, href]) => {
+export function navigation(current: ScreenName): HTMLElement {
+  const links = kLinks.map(([screen, name, label, href]) => {
     const link = element("a", { class: "nav-link", href }, icon(name), element("span", {}, label));
     if (screen === current) link.setAttribute("aria-current", "page");
     return link;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which time lies at which pixel of the timeline, how that is zoomed and dragged, and where its marks stand.
+// Which time lies at which pixel of the timeline, how that is zoomed and panned, and the ticks of its axis.
 
 import { midnight } from "../../playback/recorded_days";
 import { calendarDate, clockTime, shortDate } from "../widgets/text";
@@ -10,9 +10,9 @@ const kMinuteMs = 60_000;
 const kHourMs = 3_600_000;
 const kDayMs = 86_400_000;
 /** From twenty seconds on a screen's width to some forty days. */
-const kFinestMsPerPx = 15;
-const kCoarsestMsPerPx = (45 * kDayMs) / 1200;
-/** Room that the label of a mark takes. */
+const kMinMsPerPx = 15;
+const kMaxMsPerPx = (45 * kDayMs) / 1200;
+/** Room that the label of a tick takes. */
 const kLabelPx = 76;
 
 const kSteps = [1, 2, 5, 10, 15, 30]
@@ -35,7 +35,7 @@ export class TimeScale {
 
   constructor(startMs: number, msPerPx: number, widthPx: number) {
     this.startMs = startMs;
-    this.msPerPx = Math.min(kCoarsestMsPerPx, Math.max(kFinestMsPerPx, msPerPx));
+    this.msPerPx = Math.min(kMaxMsPerPx, Math.max(kMinMsPerPx, msPerPx));
     this.widthPx = Math.max(1, widthPx);
   }
 
@@ -71,7 +71,7 @@ export class TimeScale {
     return new TimeScale(this.msAt(px) - px * zoomed.msPerPx, zoomed.msPerPx, this.widthPx);
   }
 
-  /** The picture moves to the right by so much. */
+  /** The content moves to the right by so much. */
   panned(px: number): TimeScale {
     return new TimeScale(this.startMs - px * this.msPerPx, this.msPerPx, this.widthPx);
   }
@@ -86,7 +86,7 @@ export class TimeScale {
     return stepMs < kHourMs ? this.#fineTicks(stepMs) : this.#localTicks(stepMs);
   }
 
-  /** Zones are whole quarters of an hour apart, so that steps below need no zone. */
+  /** Time zones are multiples of fifteen minutes apart, so that steps below an hour need none. */
   #fineTicks(stepMs: number): Tick[] {
     const ticks: Tick[] = [];
     for (let atMs = Math.ceil(this.startMs / stepMs) * stepMs; atMs < this.endMs; atMs += stepMs) {
@@ -95,18 +95,18 @@ export class TimeScale {
     return ticks;
   }
 
-  /** On full hours and days of the user's zone, on days when the clock is changed, too. */
+  /** On full hours and days of the user's time zone, also on days with a change of the clock. */
   #localTicks(stepMs: number): Tick[] {
     const ticks: Tick[] = [];
     const stepHours = stepMs / kHourMs;
     const stepDays = Math.max(1, stepMs / kDayMs);
-    // Counted from a fixed day, so that the marks stay where they are while the timeline is dragged.
+    // Counted from a fixed day, so that the ticks stay in place while the timeline is dragged.
     const firstDay = midnight(this.startMs);
     const skip = Math.round(firstDay / kDayMs) % stepDays;
     for (let day = midnight(firstDay, -skip); day < this.endMs; day = midnight(day, stepDays)) {
-      const noon = new Date(day);
+      const date = new Date(day);
       for (let hour = 0; hour < 24; hour += stepHours) {
-        const atMs = new Date(noon.getFullYear(), noon.getMonth(), noon.getDate(), hour).getTime();
+        const atMs = new Date(date.getFullYear(), date.getMonth(), date.getDate(), hour).getTime();
         if (atMs >= this.startMs && atMs < this.endMs && atMs !== ticks.at(-1)?.atMs) ticks.push(tickAt(atMs, stepMs));
       }
     }
@@ -120,7 +120,7 @@ function tickAt(atMs: number, stepMs: number): Tick {
   return { atMs, isDay, label: isDay ? shortDate(atMs) : time };
 }
 
-/** The span as a person says it: one day is named once. */
+/** For the user; a day is named once. */
 export function spanText(fromMs: number, toMs: number): string {
   const time = (ms: number) => (toMs - fromMs < 10 * kMinuteMs ? clockTime(ms) : clockTime(ms).slice(0, 5));
   if (calendarDate(fromMs) === calendarDate(toMs)) return `${shortDate(fromMs)}, ${time(fromMs)} – ${time(toMs)}`;

@@ -1,17 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The cameras' past as lanes below a common axis: wheel, pinch and keys zoom, a drag moves, a click plays, and the
+// The recordings of the cameras as lanes below a common axis: wheel, pinch and keys zoom, a drag pans, a click plays, and the
 // playhead is dragged along the axis.
 
-import type { EventKind } from "../../playback/coverage";
-import { kindOf } from "../../playback/coverage";
-import { midnight, type RecordedDays } from "../../playback/recorded_days";
+import { kindOf, type EventKind } from "../../playback/coverage";
 import type { FootageCache } from "../../playback/footage_cache";
+import { midnight, type RecordedDays } from "../../playback/recorded_days";
 import type { Footage, FootageRef } from "../../wire/recordings";
-import { element, setText } from "../widgets/dom";
+import { element } from "../widgets/dom";
+import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 import { TimeScale } from "./time_scale";
 import { coloursOf, kAxisPx, paintAxis, paintGrid, paintLane, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
+import { TimelineHint } from "./timeline_hint";
 
 export interface Lane {
   camera: number;
@@ -32,20 +33,18 @@ export interface TimelineActions {
 }
 
 /** Wider than this, single events are neither fetched nor drawn, but the days that have any. */
-const kWidestEventsMs = 4 * 86_400_000;
-const kClickPx = 5;
+const kMaxEventsSpanMs = 4 * 86_400_000;
 const kMarkPx = 6;
-const kWheelZoom = 1.0015;
 const kKeyZoom = 1.6;
 const kStartSpanMs = 6 * 3_600_000;
 /** Of the span, kept free behind the playhead or the present. */
 const kAhead = 0.12;
 /** Of the span, how much may be still to come. */
-const kMostAhead = 0.3;
+const kMaxAhead = 0.3;
 
 export class Timeline {
   readonly root: HTMLElement;
-  readonly #history: FootageCache;
+  readonly #cache: FootageCache;
   readonly #days: RecordedDays;
   readonly #actions: TimelineActions;
   readonly #axis = element("canvas", { class: "timeline-axis", "aria-hidden": "true" });
@@ -56,47 +55,49 @@ export class Timeline {
     "aria-label": "Timeline: plus and minus zoom, page keys move, End goes to now",
   });
   readonly #names = element("div", { class: "timeline-names" });
-  readonly #hint = element("div", { class: "timeline-hint", hidden: true });
-  readonly #line = element("div", { class: "timeline-pointer", hidden: true });
+  readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
+  readonly #hint = new TimelineHint(this.#drawn);
+  readonly #pointers: PanZoomPointers;
   readonly #resized = new ResizeObserver(() => this.#resize());
-  readonly #pointers = new Map<number, { x: number; y: number }>();
   #colours: Colours | null = null;
   #scale = TimeScale.of(Date.now() - kStartSpanMs, Date.now() + kStartSpanMs * kAhead, 1000);
   #lanes: readonly Lane[] = [];
   #kinds: ReadonlySet<EventKind> = new Set();
   #playheadMs: number | null = null;
   #selected: FootageRef | null = null;
-  #frame = 0;
-  #dragged = 0;
+  #animationFrame = 0;
   #isScrubbing = false;
 
-  constructor(history: FootageCache, days: RecordedDays, actions: TimelineActions) {
-    this.#history = history;
+  constructor(cache: FootageCache, days: RecordedDays, actions: TimelineActions) {
+    this.#cache = cache;
     this.#days = days;
     this.#actions = actions;
-    const drawn = element("div", { class: "timeline-drawn" }, this.#canvas, this.#line, this.#hint);
-    const scrolled = element("div", { class: "timeline-scroll" }, this.#names, drawn);
+    const scrolled = element("div", { class: "timeline-scroll" }, this.#names, this.#drawn);
     const head = element("div", { class: "timeline-head" }, element("div", { class: "timeline-corner" }), this.#axis);
     this.root = element("section", { class: "timeline", "aria-label": "Timeline" }, head, scrolled);
-    this.#resized.observe(drawn);
-    for (const canvas of [this.#canvas, this.#axis]) {
-      canvas.addEventListener("wheel", (event) => this.#wheel(event), { passive: false });
-      canvas.addEventListener("pointerdown", (event) => this.#press(event));
-      canvas.addEventListener("pointermove", (event) => this.#move(event));
-      canvas.addEventListener("pointerup", (event) => this.#release(event));
-      canvas.addEventListener("pointercancel", (event) => this.#forget(event));
-    }
-    this.#canvas.addEventListener("pointerleave", () => this.#showHint(null));
-    this.#canvas.addEventListener("keydown", (event) => this.#key(event));
+    this.#resized.observe(this.#drawn);
+    const panZoom: PanZoomActions = {
+      pan: (px) => this.#show(this.#scale.panned(px)),
+      zoom: (factor, { x }) => this.zoom(1 / factor, x),
+    };
+    panZoomByWheel(this.#axis, panZoom);
+    panZoomByWheel(this.#canvas, panZoom);
+    this.#pointers = new PanZoomPointers(this.#canvas, panZoom, "x");
+    this.#listenToScrubbing();
+    this.#canvas.addEventListener("click", (event) => this.#click(event));
+    this.#canvas.addEventListener("pointerdown", () => this.#hint.hide());
+    this.#canvas.addEventListener("pointermove", (event) => this.#pointers.isPressed || this.#showHint(event));
+    this.#canvas.addEventListener("pointerleave", () => this.#hint.hide());
+    this.#canvas.addEventListener("keydown", (event) => this.#pressKey(event));
   }
 
   get scale(): TimeScale {
     return this.#scale;
   }
 
-  /** Whether single events are shown. */
-  get isFine(): boolean {
-    return this.#scale.spanMs <= kWidestEventsMs;
+  /** Whether single events are shown, or only the days that have any. */
+  get showsEvents(): boolean {
+    return this.#scale.spanMs <= kMaxEventsSpanMs;
   }
 
   setLanes(lanes: readonly Lane[], onStage: readonly number[]): void {
@@ -117,14 +118,14 @@ export class Timeline {
     this.redraw();
   }
 
-  /** The playhead moves; while it plays, the timeline turns the page when the playhead leaves it. */
+  /** Moves the playhead. When it leaves the span during playback, the timeline follows. */
   setPlayhead(atMs: number | null, selected: FootageRef | null, isPlaying: boolean): void {
     const was = this.#playheadMs;
     this.#selected = selected;
     this.#playheadMs = atMs;
     if (atMs === null) return this.redraw();
     const isLeaving = was !== null && this.#scale.contains(was) && !this.#scale.contains(atMs);
-    if (isPlaying && isLeaving && this.#pointers.size === 0) this.reveal(atMs);
+    if (isPlaying && isLeaving && !this.#pointers.isPressed && !this.#isScrubbing) this.reveal(atMs);
     this.#canvas.setAttribute("aria-valuenow", String(Math.round(atMs / 1000)));
     this.#canvas.setAttribute("aria-valuetext", `${shortDate(atMs)} ${clockTime(atMs)}`);
     this.redraw();
@@ -146,20 +147,21 @@ export class Timeline {
     this.#show(this.#scale.panned((this.#scale.endMs - endMs) / this.#scale.msPerPx));
   }
 
-  zoom(factor: number, px = this.#zoomCentre()): void {
-    this.#show(this.#scale.zoomed(factor, px));
+  /** A factor above 1 shows more time. */
+  zoom(factor: number, atPx = this.#zoomCentre()): void {
+    this.#show(this.#scale.zoomed(factor, atPx));
   }
 
   redraw(): void {
-    this.#frame ||= requestAnimationFrame(() => {
-      this.#frame = 0;
+    this.#animationFrame ||= requestAnimationFrame(() => {
+      this.#animationFrame = 0;
       this.#draw();
     });
   }
 
   close(): void {
     this.#resized.disconnect();
-    cancelAnimationFrame(this.#frame);
+    cancelAnimationFrame(this.#animationFrame);
   }
 
   #zoomCentre(): number {
@@ -169,14 +171,14 @@ export class Timeline {
 
   #show(scale: TimeScale): void {
     // Of the future there is nothing to see.
-    const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMostAhead);
+    const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMaxAhead);
     this.#scale = beyondMs > 0 ? scale.panned(beyondMs / scale.msPerPx) : scale;
     this.#actions.moved();
     this.redraw();
   }
 
   #resize(): void {
-    const widthPx = this.#canvas.parentElement!.clientWidth;
+    const widthPx = this.#drawn.clientWidth;
     if (widthPx === 0) return;
     this.root.style.setProperty("--lanes", String(Math.max(1, this.#lanes.length)));
     // The newest stays in place: the right end does.
@@ -201,7 +203,7 @@ export class Timeline {
     this.#lanes.forEach(({ camera }, index) => {
       const content = {
         ...this.#contentOf(camera),
-        hasDay: this.isFine ? null : (day: number) => this.#days.has(camera, day),
+        hasDay: this.showsEvents ? null : (day: number) => this.#days.has(camera, day),
       };
       paintLane(context, scale, colours, content, index * lanePx, lanePx, this.#selected);
     });
@@ -212,58 +214,29 @@ export class Timeline {
   }
 
   #contentOf(camera: number) {
-    if (!this.isFine) return { footage: [], segments: [] };
-    const { footage, segments } = this.#history.of(camera, this.#scale.startMs / 1000, this.#scale.endMs / 1000);
+    if (!this.showsEvents) return { footage: [], segments: [] };
+    const { footage, segments } = this.#cache.get(camera, this.#scale.startMs / 1000, this.#scale.endMs / 1000);
     return { segments, footage: footage.filter((one) => this.#kinds.has(kindOf(one))) };
   }
 
-  #wheel(event: WheelEvent): void {
-    event.preventDefault();
-    const lines = event.deltaMode === WheelEvent.DOM_DELTA_LINE ? 16 : 1;
-    const [x, y] = [event.deltaX * lines, event.deltaY * lines];
-    if (event.shiftKey || Math.abs(x) > Math.abs(y)) this.#show(this.#scale.panned(-(x || y)));
-    // A trackpad's pinch comes as a wheel with Ctrl, in smaller steps.
-    else this.zoom(kWheelZoom ** (event.ctrlKey ? y * 6 : y), event.offsetX);
+  #listenToScrubbing(): void {
+    const scrub = (event: PointerEvent) => this.#isScrubbing && this.#actions.scrub(this.#scale.msAt(event.offsetX));
+    this.#axis.addEventListener("pointerdown", (event) => {
+      if (event.button !== 0) return;
+      this.#axis.setPointerCapture(event.pointerId);
+      this.#isScrubbing = true;
+      scrub(event);
+    });
+    this.#axis.addEventListener("pointermove", scrub);
+    this.#axis.addEventListener("lostpointercapture", () => (this.#isScrubbing = false));
   }
 
-  #press(event: PointerEvent): void {
-    if (event.button > 0) return;
-    (event.target as Element).setPointerCapture(event.pointerId);
-    this.#pointers.set(event.pointerId, { x: event.offsetX, y: event.offsetY });
-    if (this.#pointers.size === 1) this.#dragged = 0;
-    this.#isScrubbing = event.target === this.#axis;
-    if (this.#isScrubbing) this.#actions.scrub(this.#scale.msAt(event.offsetX));
-    this.#showHint(null);
-  }
-
-  #move(event: PointerEvent): void {
-    const before = this.#pointers.get(event.pointerId);
-    if (!before) return this.#showHint(event.target === this.#canvas ? event : null);
-    const now = { x: event.offsetX, y: event.offsetY };
-    this.#pointers.set(event.pointerId, now);
-    this.#dragged += Math.abs(now.x - before.x) + Math.abs(now.y - before.y);
-    if (this.#isScrubbing) return this.#actions.scrub(this.#scale.msAt(now.x));
-    const other = [...this.#pointers].find(([id]) => id !== event.pointerId)?.[1];
-    if (other) {
-      const [wasApart, isApart] = [Math.abs(before.x - other.x), Math.abs(now.x - other.x)];
-      if (wasApart > 10 && isApart > 10) this.zoom(wasApart / isApart, (now.x + other.x) / 2);
-    } else if (this.#dragged > kClickPx) this.#show(this.#scale.panned(now.x - before.x));
-  }
-
-  #release(event: PointerEvent): void {
-    const wasClick = this.#pointers.size === 1 && this.#dragged <= kClickPx && !this.#isScrubbing;
-    this.#forget(event);
-    if (!wasClick) return;
+  #click(event: MouseEvent): void {
     const camera = this.#laneAt(event.offsetY);
-    if (camera === undefined) return;
-    const mark = this.#footageAt(camera, event.offsetX).mark;
+    if (camera === undefined || this.#pointers.hasMoved) return;
+    const { mark } = this.#footageAt(camera, event.offsetX);
     if (mark) this.#actions.open(mark);
     else this.#actions.seek(this.#scale.msAt(event.offsetX), camera);
-  }
-
-  #forget(event: PointerEvent): void {
-    this.#pointers.delete(event.pointerId);
-    if (this.#pointers.size === 0) this.#isScrubbing = false;
   }
 
   #laneAt(y: number): number | undefined {
@@ -279,20 +252,16 @@ export class Timeline {
     };
   }
 
-  #showHint(event: PointerEvent | null): void {
-    const camera = event ? this.#laneAt(event.offsetY) : undefined;
-    this.#hint.hidden = this.#line.hidden = !event || camera === undefined || event.pointerType === "touch";
-    if (!event || camera === undefined) return;
-    const atMs = this.#scale.msAt(event.offsetX);
-    const { event: recording, mark } = this.#footageAt(camera, event.offsetX);
-    const about = mark ? mark.text : recording ? `${duration(recording.stop - recording.start)} recorded` : "";
-    setText(this.#hint, `${this.isFine ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`);
-    this.root.style.setProperty("--pointer", `${event.offsetX}px`);
-    this.#hint.classList.toggle("at-right", event.offsetX > this.#scale.widthPx - 240);
-    this.root.style.setProperty("--pointer-y", `${event.offsetY}px`);
+  #showHint({ offsetX: x, offsetY: y, pointerType }: PointerEvent): void {
+    const camera = this.#laneAt(y);
+    if (camera === undefined || pointerType === "touch") return this.#hint.hide();
+    const atMs = this.#scale.msAt(x);
+    const { event, mark } = this.#footageAt(camera, x);
+    const about = mark ? mark.text : event ? `${duration(event.stop - event.start)} recorded` : "";
+    this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`);
   }
 
-  #key(event: KeyboardEvent): void {
+  #pressKey(event: KeyboardEvent): void {
     if (event.altKey || event.ctrlKey || event.metaKey) return;
     if (event.key === "+" || event.key === "=") this.zoom(1 / kKeyZoom);
     else if (event.key === "-") this.zoom(kKeyZoom);

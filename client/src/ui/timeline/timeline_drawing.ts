@@ -2,8 +2,8 @@
 //
 // Paints the timeline: the axis, and for each camera a lane of coverage, events and marks.
 //
-// Why so        Ten thousand events are less than a screen has pixels. Bars that would fall into the pixel of the one
-//               before are left out, and each colour is filled once, so that dragging stays smooth.
+// Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of the one
+//               before are left out, and each colour is filled once, so that dragging is smooth.
 
 import { midnights } from "../../playback/recorded_days";
 import { firstEndingAfter, kindOf, type EventKind, type Segment } from "../../playback/coverage";
@@ -12,7 +12,7 @@ import type { TimeScale } from "./time_scale";
 
 export const kAxisPx = 26;
 
-/** All of a lane that the painter needs. */
+/** What is drawn in a lane. */
 export interface LaneContent {
   /** By start; of the kinds that are shown. */
   footage: readonly Footage[];
@@ -177,7 +177,7 @@ function paintGrowing(
   }
 }
 
-/** An alert is a triangle in the accent, a sale a square; both stand above their place. */
+/** An alert is a triangle in the accent colour, a POS transaction a square; both stand above their time. */
 function paintMark(
   context: CanvasRenderingContext2D,
   scale: TimeScale,

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// All tiles: arranges them, and lets those stream that are on the screen.
+// The tiles of all cameras: arranges them, and lets those stream that are visible.
 //
 // Invariants    (1) A tile that nobody can see (scrolled away, behind the large view, in a hidden tab) has no connection.
 //               (2) Never more tiles stream than the connection to the server carries.
@@ -14,11 +14,11 @@ import { Tile, type TileActions, type TileMode } from "./tile";
 
 /** Scrolling past a tile must not open and close a stream. */
 const kSettleMs = 120;
-/** A picture drawn wider than this gains from more pixels than the small profile has. */
-const kSmallPictureLimitPx = 800;
+/** Drawn wider than this, a picture needs more pixels than the small profile has. */
+const kMaxSmallPicturePx = 800;
 
-/** A tile of which less shows at the edge of the screen needs no picture. */
-const kSeenPart = 0.1;
+/** A tile of which less is visible needs no picture. */
+const kMinVisibleRatio = 0.1;
 
 const kSteps: Record<string, (columns: number) => number> = {
   ArrowLeft: () => -1,
@@ -32,7 +32,7 @@ export class Grid {
   readonly #server: Server;
   readonly #actions: TileActions;
   readonly #semaphore = new Semaphore(1);
-  readonly #limit: number;
+  readonly #maxStreams: number;
   readonly #tiles = new Map<number, Tile>();
   readonly #visible = new Set<number>();
   readonly #observer: IntersectionObserver;
@@ -45,23 +45,23 @@ export class Grid {
   #layout: LayoutChoice = "auto";
   #columns = 1;
   #tilePx = 0;
-  /** Tiles that would have no use for a stream, as text to compare. */
-  #blocked = "";
+  /** The ids of tiles that cannot play a stream, as text to compare. */
+  #unplayable = "";
 
   constructor(server: Server, actions: TileActions) {
     this.#server = server;
     this.#actions = actions;
-    this.#limit = streamLimit(protocol());
-    this.#observer = new IntersectionObserver((entries) => this.#see(entries), {
+    this.#maxStreams = streamLimit(protocol());
+    this.#observer = new IntersectionObserver((entries) => this.#onIntersection(entries), {
       root: this.root,
-      threshold: kSeenPart,
+      threshold: kMinVisibleRatio,
     });
     this.#resized.observe(this.root);
     document.addEventListener("visibilitychange", this.#assignSoon);
     this.root.addEventListener("keydown", (event) => this.#onKey(event));
   }
 
-  /** Shows these cameras in this order; the tiles of cameras that stay go on without a break. */
+  /** Shows these cameras in this order; tiles of cameras that stay play on without interruption. */
   setCameras(cameras: readonly Camera[]): void {
     const unchanged = new Map(
       [...this.#tiles].filter(([, tile]) => cameras.some((camera) => same(camera, tile.camera))),
@@ -99,9 +99,9 @@ export class Grid {
   /** How many of the tiles on the screen have lost their signal. Also brings all tiles up to date with the clock. */
   refresh(): number {
     let lost = 0;
-    const blocked = this.#inOrder().flatMap((tile) => (tile.unplayable ? tile.camera.id : []));
-    if (blocked.join() !== this.#blocked) this.#assignSoon();
-    this.#blocked = blocked.join();
+    const unplayable = this.#inOrder().flatMap((tile) => (tile.unplayable ? tile.camera.id : []));
+    if (unplayable.join() !== this.#unplayable) this.#assignSoon();
+    this.#unplayable = unplayable.join();
     for (const tile of this.#tiles.values()) {
       tile.picture.refresh();
       if (tile.picture.state().kind === "lost") lost += 1;
@@ -126,10 +126,10 @@ export class Grid {
     tile.root.remove();
   }
 
-  #see(entries: IntersectionObserverEntry[]): void {
+  #onIntersection(entries: IntersectionObserverEntry[]): void {
     for (const entry of entries) {
       const id = Number((entry.target as HTMLElement).dataset["camera"]);
-      if (entry.intersectionRatio >= kSeenPart) this.#visible.add(id);
+      if (entry.intersectionRatio >= kMinVisibleRatio) this.#visible.add(id);
       else this.#visible.delete(id);
     }
     this.#assignSoon();
@@ -138,9 +138,9 @@ export class Grid {
   #assign(): void {
     const shown = document.hidden ? [] : this.#inOrder().filter((tile) => this.#visible.has(tile.camera.id));
     const playable = shown.filter((tile) => !tile.unplayable).map((tile) => tile.camera.id);
-    const streaming = new Set(this.#inOrder().flatMap((tile) => (tile.streams ? [tile.camera.id] : [])));
-    const chosen = chooseStreams(playable, streaming, this.#limit);
-    const stream: TileMode = this.#tilePx * devicePixelRatio > kSmallPictureLimitPx ? "stream-full" : "stream-small";
+    const streaming = new Set(this.#inOrder().flatMap((tile) => (tile.isStreaming ? [tile.camera.id] : [])));
+    const chosen = chooseStreams(playable, streaming, this.#maxStreams);
+    const stream: TileMode = this.#tilePx * devicePixelRatio > kMaxSmallPicturePx ? "stream-full" : "stream-small";
     for (const tile of this.#inOrder()) {
       tile.mode = chosen.has(tile.camera.id) ? stream : shown.includes(tile) ? "poll" : "off";
     }
@@ -178,7 +178,7 @@ export class Grid {
   }
 }
 
-/** How the page and what it loaded came; a page out of the browser's cache may not know. */
+/** The protocol over which the page was loaded; undefined for a page from the browser's cache. */
 function protocol(): string | undefined {
   const loaded = [...performance.getEntriesByType("navigation"), ...performance.getEntriesByType("resource")];
   return (loaded as PerformanceResourceTiming[]).find(({ nextHopProtocol }) => nextHopProtocol !== "")?.nextHopProtocol;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How many columns of which width make the best use of the wall.
+// The layouts of the wall: how many columns, and how wide a tile is.
 
 export type LayoutChoice = "auto" | "1" | "2" | "3";
 
@@ -15,9 +15,9 @@ export interface Space {
   barPx: number;
 }
 
-/** Below this width a screen shows one column, whatever was chosen. */
+/** Narrower screens show one column, whatever was chosen. */
 const kPhoneWidthPx = 640;
-const kSmallestTilePx = 240;
+const kMinTilePx = 240;
 const kPictureRatio = 16 / 9;
 
 /** Columns and width of a tile; what does not fit on the screen is scrolled. */
@@ -31,14 +31,14 @@ export function arrange(tiles: number, choice: LayoutChoice, space: Space): { co
   if (space.widthPx < kPhoneWidthPx) return { columns: 1, tilePx: widthFor(1) };
   if (choice !== "auto") {
     const side = Number(choice);
-    return { columns: side, tilePx: Math.max(widthToFit(side, side), Math.min(kSmallestTilePx, widthFor(side))) };
+    return { columns: side, tilePx: Math.max(widthToFit(side, side), Math.min(kMinTilePx, widthFor(side))) };
   }
   let best = { columns: 1, tilePx: widthToFit(1, tiles) };
   for (let columns = 2; columns <= tiles; columns += 1) {
     const tilePx = widthToFit(columns, Math.ceil(tiles / columns));
     if (tilePx > best.tilePx) best = { columns, tilePx };
   }
-  if (best.tilePx >= kSmallestTilePx) return best;
-  const columns = Math.max(1, Math.floor((space.widthPx + space.gapPx) / (kSmallestTilePx + space.gapPx)));
+  if (best.tilePx >= kMinTilePx) return best;
+  const columns = Math.max(1, Math.floor((space.widthPx + space.gapPx) / (kMinTilePx + space.gapPx)));
   return { columns, tilePx: widthFor(columns) };
 }

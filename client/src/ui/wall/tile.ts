@@ -9,8 +9,8 @@ import type { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
-import { Picture, type PictureState } from "../camera/live_picture";
-import { sentenceOf } from "../widgets/text";
+import { LivePicture, type PictureState } from "../camera/live_picture";
+import { signalText } from "../widgets/text";
 
 /** How a tile gets its pictures. */
 export type TileMode = "off" | "poll" | "stream-small" | "stream-full";
@@ -23,7 +23,7 @@ export interface TileActions {
 export class Tile {
   readonly root: HTMLElement;
   readonly camera: Camera;
-  readonly picture: Picture;
+  readonly picture: LivePicture;
   readonly #open: HTMLButtonElement;
   readonly #state = element("span", { class: "tile-state" });
   readonly #stills: SnapshotSource;
@@ -37,7 +37,7 @@ export class Tile {
       "stream-full": new StreamSource(server, camera, false, this.#stills),
     };
     this.#open = element("button", { type: "button", class: "tile-open" });
-    this.picture = new Picture(
+    this.picture = new LivePicture(
       () => this.unplayable,
       () => this.#showState(),
       false,
@@ -62,13 +62,13 @@ export class Tile {
     this.#showState();
   }
 
-  /** Why a stream would be of no use to the tile; null when it has one, or would like one. */
+  /** Why the tile cannot play a stream; null when it plays one, or could. */
   get unplayable(): Unplayable | null {
     return this.#streams["stream-small"].unplayable ?? this.#streams["stream-full"].unplayable;
   }
 
-  get streams(): boolean {
-    return this.picture.feed.source?.everyMs === 0;
+  get isStreaming(): boolean {
+    return this.picture.feed.source?.pollIntervalMs === 0;
   }
 
   focus(): void {
@@ -78,13 +78,13 @@ export class Tile {
   #showState(): void {
     const state = this.picture.state();
     this.root.dataset["state"] = state.kind;
-    const word = this.#wordFor(state);
-    setText(this.#state, word);
-    this.#open.setAttribute("aria-label", `${this.camera.name}, ${word}: open large`);
+    const text = this.#stateText(state);
+    setText(this.#state, text);
+    this.#open.setAttribute("aria-label", `${this.camera.name}, ${text}: open large`);
   }
 
-  /** Short, since the picture itself carries the whole sentence. */
-  #wordFor(state: PictureState): string {
+  /** Short, since the picture itself shows the whole sentence. */
+  #stateText(state: PictureState): string {
     switch (state.kind) {
       case "unavailable":
         return "not available";
@@ -92,7 +92,7 @@ export class Tile {
         return "no signal";
       case "live":
       case "connecting":
-        return sentenceOf(state, this.picture.feed.source?.everyMs);
+        return signalText(state, this.picture.feed.source?.pollIntervalMs);
       case "idle":
         return "";
     }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Builds elements: attributes as given, text through textContent only, so that no name of a camera is ever markup.
+// Builds elements: attributes as given, text as text nodes only, so that no name of a camera is ever markup.
 
 type Attributes = Record<string, string | boolean>;
 
@@ -18,7 +18,7 @@ export function element<Tag extends keyof HTMLElementTagNameMap>(
   return made;
 }
 
-/** Writes a text only when it changes: a tile asks twice a second. */
+/** Writes the text only when it changes: tiles call this twice a second. */
 export function setText(target: HTMLElement, text: string): void {
   if (target.textContent !== text) target.textContent = text;
 }

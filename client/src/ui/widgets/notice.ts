@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One short message at the foot of the window, read out to those who do not see it, gone after a while.
+// One short message at the bottom of the window, announced to screen readers, gone after a while.
 
 import { element } from "./dom";
 

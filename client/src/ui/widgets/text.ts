@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Words and numbers as the user reads them.
+// Times, names and states as text for the user.
 
 import type { SignalState } from "../../live/signal_state";
 
@@ -38,7 +38,7 @@ export function duration(seconds: number): string {
   return `${hours > 0 ? `${hours}:${two(minutes)}` : minutes}:${two(rest % 60)}`;
 }
 
-/** "½×" for slow motion by two, "4×" for four times as fast. */
+/** "½×" for slow motion by a factor of two, "4×" for four times as fast. */
 export function rateText(rate: number): string {
   const slow: Record<number, string> = { [-2]: "½", [-4]: "¼", [-8]: "⅛" };
   return `${slow[rate] ?? rate}×`;
@@ -54,15 +54,15 @@ export function snapshotFileName(cameraName: string, takenMs: number): string {
   return `${name}_${calendarDate(takenMs)}_${clockTime(takenMs).replaceAll(":", "-")}.jpg`;
 }
 
-/** `everyMs` is the time between two pictures of a source that polls. */
-export function sentenceOf(state: SignalState, everyMs = 0): string {
+/** `pollIntervalMs` is the time between two pictures of a source that polls. */
+export function signalText(state: SignalState, pollIntervalMs = 0): string {
   switch (state.kind) {
     case "idle":
       return "paused";
     case "connecting":
       return "connecting";
     case "live":
-      return everyMs > 0 ? `live, every ${everyMs / 1000} s` : "live";
+      return pollIntervalMs > 0 ? `live, every ${pollIntervalMs / 1000} s` : "live";
     case "lost":
       return `no signal since ${clockTime(state.sinceMs)}`;
   }

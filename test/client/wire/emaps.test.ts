@@ -1,10 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maps without a browser: what the server's two forms of an item become, what is saved, and the editor's steps.
+// Maps of the server: what its two forms of an item become, and what is saved.
 
-import { EditHistory } from "../../client/src/ui/map/edit_history";
-import { Emaps } from "../../client/src/wire/emaps";
-import { Server } from "../../client/src/wire/server";
+import { Emaps } from "../../../client/src/wire/emaps";
+import { Server } from "../../../client/src/wire/server";
 
 const kText = { name: "Gate <b>", x: "5", y: "7", direction: "90", textPos: "2", iconCenterX: 3, iconCenterY: -3 };
 
@@ -86,29 +85,5 @@ describe("a map as the server tells it", () => {
     const [far, own] = asked.map(({ url }) => Object.fromEntries(url.searchParams));
     expect(far).toMatchObject({ api: "VEXO.Relay", server: "3", camera: "4", profileType: "1" });
     expect(own).toEqual({ api: "VEXO.Lookhaven.Player.LiveviewSrc", version: "1", method: "Play", camera: "4" });
-  });
-});
-
-describe("the steps of an editor", () => {
-  it("lead back and forth, and know what is saved", () => {
-    const history = new EditHistory("a");
-    const facts = () => [history.current, history.canUndo, history.canRedo, history.isChanged];
-    history.undo();
-    history.redo();
-    expect(facts()).toEqual(["a", false, false, false]);
-    history.add("b");
-    history.add("c");
-    history.markSaved("b");
-    expect(facts()).toEqual(["c", true, false, true]);
-    history.undo();
-    expect(facts()).toEqual(["b", true, true, false]);
-    history.undo();
-    history.add("d");
-    expect(facts()).toEqual(["d", true, false, true]);
-    history.undo();
-    expect(history.current).toBe("a");
-    for (let step = 0; step < 1000; step += 1) history.add(`${step}`);
-    for (let step = 0; step < 1000; step += 1) history.undo();
-    expect(history.current).toBe("800");
   });
 });

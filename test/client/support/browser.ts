@@ -99,10 +99,7 @@ export class Page {
     return (result as { value: Awaited<Result> }).value;
   }
 
-  async until<Arguments extends unknown[]>(
-    condition: (...given: Arguments) => boolean,
-    ...given: Arguments
-  ): Promise<void> {
+  async until<Arguments extends unknown[]>(condition: (...given: Arguments) => boolean, ...given: Arguments): Promise<void> {
     await vi.waitFor(async () => expect(await this.run(condition, ...given), String(condition)).toBe(true), {
       timeout: 12_000,
       interval: 50,
@@ -115,19 +112,9 @@ export class Page {
 
   async press(key: string): Promise<void> {
     const text = key.length === 1 ? { text: key } : key === "Enter" ? { text: "\r" } : {};
-    await this.send("Input.dispatchKeyEvent", {
-      type: "keyDown",
-      key,
-      code: key,
-      windowsVirtualKeyCode: kCodes[key] ?? 0,
-      ...text,
-    });
-    await this.send("Input.dispatchKeyEvent", {
-      type: "keyUp",
-      key,
-      code: key,
-      windowsVirtualKeyCode: kCodes[key] ?? 0,
-    });
+    const common = { key, code: key, windowsVirtualKeyCode: kCodes[key] ?? 0 };
+    await this.send("Input.dispatchKeyEvent", { type: "keyDown", ...common, ...text });
+    await this.send("Input.dispatchKeyEvent", { type: "keyUp", ...common });
   }
 }
 

@@ -2,62 +2,33 @@
 //
 // The events' screen in a real browser: from the calendar to the picture of a time, and with keys from there.
 
-import { Browser, hasBrowser, type Page } from "./browser";
-import { FakeServer } from "./fake_server";
+import { hasBrowser, type Page } from "../../support/browser";
+import { ServedClient, smallControls } from "../../support/served_client";
 
 const kFrames = 3_000;
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
-  const server = new FakeServer();
-  const { archive } = server;
-  let browser: Browser;
-  let address: string;
+  const client = new ServedClient();
+  const { archive } = client.server;
   /** Two days ago at noon of the browser's zone: an hour of two cameras, in recordings of five minutes. */
   const noon = Math.floor(new Date(Date.now() - 2 * 86_400_000).setHours(12, 0, 0, 0) / 1000);
 
-  beforeAll(async () => {
-    browser = new Browser();
-    address = await server.start();
-    const page = await browser.open(address, 100, 100);
-    // Of each frame the brightness tells the index.
-    const shades = await page.run(() => {
-      const canvas = Object.assign(document.createElement("canvas"), { width: 64, height: 36 });
-      const context = canvas.getContext("2d")!;
-      return Array.from({ length: 16 }, (_, shade) => {
-        context.fillStyle = `rgb(${shade * 16} ${shade * 16} ${shade * 16})`;
-        context.fillRect(0, 0, 64, 36);
-        return canvas.toDataURL("image/jpeg").split(",")[1]!;
-      });
-    });
-    const pictures = shades.map((shade) => Buffer.from(shade, "base64"));
-    server.jpeg = pictures[8]!;
-    archive.picture = (index) => pictures[index % 16]!;
+  beforeAll(() => {
     archive.framesPerSecond = 10;
-    server.cameras.push({ id: 1, name: "Entrance <b>", video_type: 1 }, { id: 2, name: "Parking", video_type: 1 });
+    client.server.cameras.push({ id: 1, name: "Entrance <b>", video_type: 1 }, { id: 2, name: "Parking", video_type: 1 });
     for (let piece = 0; piece < 12; piece += 1) {
       const start = noon + piece * 300;
       archive.recorded.push({ id: 10 + piece, camera: 1, start, stop: start + 300, frames: kFrames });
       archive.recorded.push({ id: 40 + piece, camera: 2, start, stop: start + 300, frames: kFrames, reason: 3 });
     }
     archive.recorded.push({ id: 90, camera: 2, start: noon, stop: noon + 30, frames: 300, kind: "pos", text: "2 Tea <b>\nTotal 5" });
-    await page.send("Page.close", {});
-  }, 30_000);
-
-  afterAll(async () => {
-    await browser.close();
-    server.close();
   });
 
   async function opened(hash: string, widthPx: number, heightPx: number, players = 1): Promise<Page> {
     archive.playersPerSession = players;
     archive.asked.length = 0;
-    server.hasSession = true;
-    const page = await browser.open(`${address}${hash}`, widthPx, heightPx);
-    await page.until(() => document.querySelector(".events") !== null);
-    await page.run(() =>
-      addEventListener("securitypolicyviolation", (event) => (document.title += ` ${event.violatedDirective}`)),
-    );
-    return page;
+    client.server.hasSession = true;
+    return client.open(`${client.address}${hash}`, widthPx, heightPx);
   }
 
   const state = (page: Page, wanted: string) =>
@@ -108,12 +79,10 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.press("]");
     await page.press(" ");
     await vi.waitFor(() => expect(archive.asked.at(-1)).toMatch(/ at 2$/));
-    expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
     await page.run(() => history.back());
     await state(page, "empty");
     expect(await page.run(() => location.hash)).toBe("#events");
-    await page.send("Page.close", {});
-    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+    await client.leave(page);
   }, 40_000);
 
   test("an address opens its recording; the file is offered; a mark's text is text", async () => {
@@ -123,11 +92,10 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const link = () => document.querySelector<HTMLAnchorElement>("a[aria-label^=Download]")!.getAttribute("href");
     expect(await page.run(link)).toBe("webapi?api=VEXO.Event&version=1&method=Download&event=90&kind=pos");
     await page.until(() => [...document.querySelectorAll(".row-text")].some((row) => row.textContent === "2 Tea <b> · Total 5"));
-    await page.send("Page.close", {});
-    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+    await client.leave(page);
   }, 40_000);
 
-  test("two cameras play the same time where the server allows it; the one that is pushed out says so", async () => {
+  test("two cameras play the same time where the server allows it; the one that is preempted says so", async () => {
     const page = await opened("#event=14", 1440, 900, 4);
     await state(page, "playing");
     await page.run(() => document.querySelectorAll<HTMLElement>(".lane-name")[1]!.click());
@@ -137,8 +105,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(Math.abs(first! - second!)).toBeLessThanOrEqual(2000);
     archive.streams[0]!.preempt();
     await page.until(() => document.querySelector(".stage-picture[data-state=preempted] .button") !== null);
-    await page.send("Page.close", {});
-    await vi.waitFor(() => expect(archive.streams).toEqual([]));
+    await client.leave(page);
   }, 40_000);
 
   test("ten thousand events of a day are listed and drawn, and cost the page no more elements than ten", async () => {
@@ -163,19 +130,15 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     }
     await page.until(() => document.querySelector(".list-head")!.textContent!.startsWith("10000 events"));
     expect(await page.run(elements)).toBeLessThan(quiet + 500);
-    await page.send("Page.close", {});
+    await client.leave(page);
     archive.recorded.splice(archive.recorded.findIndex(({ id }) => id === 1_000), 10_000);
   }, 40_000);
 
   test("a phone has all of it, nothing too small for a finger, and no sideways scrolling", async () => {
     const page = await opened("#event=14", 390, 844);
     await state(page, "playing");
-    const small = () =>
-      [...document.querySelectorAll("button:not(.day), a, summary, select")]
-        .filter((control) => control.getClientRects().length > 0 && control.clientHeight < 44)
-        .map((control) => control.ariaLabel ?? control.textContent);
-    expect(await page.run(small)).toEqual([]);
+    expect(await page.run(smallControls, "button:not(.day), a, summary, select")).toEqual([]);
     expect(await page.run(() => document.documentElement.scrollWidth)).toBe(390);
-    await page.send("Page.close", {});
+    await client.leave(page);
   }, 40_000);
 });

@@ -31,6 +31,8 @@ export class FakeServer {
   readonly stalled = new Set<number>();
   /** "camera/profile" of each stream that is open. */
   readonly streams: string[] = [];
+  /** Data of further answers, by method. */
+  answers: Record<string, unknown> = {};
   polls = 0;
   mostPollsAtOnce = 0;
   hasSession = false;
@@ -43,7 +45,7 @@ export class FakeServer {
   #pollsNow = 0;
 
   async start(): Promise<string> {
-    const client = join(__dirname, "../../client");
+    const client = join(__dirname, "../../../client");
     const vite = [
       "node_modules/vite/bin/vite.js",
       "build",
@@ -69,6 +71,7 @@ export class FakeServer {
     if (method === "Login") this.hasSession = true;
     if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
     if (method === "Logout") this.hasSession = false;
+    if (method! in this.answers) return json(answer, 200, { success: true, data: this.answers[method!] });
     if (method === "Get" && searchParams.get("api") === "VEXO.Picture") return this.#snapshot(answer);
     if (method === "Play") return this.#play(searchParams, answer);
     if (/VEXO\.(Playback|Event|Catalog)|Player$/.test(searchParams.get("api")!) && method !== "LoadCamera") {

@@ -2,7 +2,7 @@
 //
 // The multipart parser against splits, odd headers and senders that lie.
 
-import { MultipartError, MultipartParser, boundaryOf, type Part } from "../../client/src/wire/multipart";
+import { MultipartError, MultipartParser, boundaryOf, type Part } from "../../../client/src/wire/multipart";
 
 const latin1 = (text: string) => Uint8Array.from(text, (letter) => letter.charCodeAt(0));
 const textOf = (bytes: Uint8Array) => String.fromCharCode(...bytes);

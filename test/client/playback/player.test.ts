@@ -1,73 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recordings: times and frames, days and segments, the timeline's scale, and a player against a server of its own.
+// A player against a server of its own.
 
-import { segmentsOf } from "../../client/src/playback/coverage";
-import { midnight, midnights, questionsFor } from "../../client/src/playback/recorded_days";
-import { FrameClock } from "../../client/src/playback/frame_clock";
-import { Player } from "../../client/src/playback/player";
-import { TimeScale } from "../../client/src/ui/timeline/time_scale";
-import { Recordings, type Footage, type Runs } from "../../client/src/wire/recordings";
-import { Server } from "../../client/src/wire/server";
-import { FakeArchive } from "./fake_archive";
-
-const kHourMs = 3_600_000;
-
-test.each<[string, Runs, [number, number, boolean][]]>([
-  ["holes are left out", [[0, 2], [1, 3], [0, 1], [2, 1]], [[110, 125, false], [130, 135, true]]],
-  ["the last step is cut at the end of the span", [[1, 100]], [[100, 200, false]]],
-  ["nothing of a run that lies behind it", [[0, 20], [1, 5]], []],
-  ["a damaged count moves nothing backwards", [[1, -3], [1, 1]], [[100, 105, false]]],
-])("segments: %s", (_name, runs, segments) => {
-  expect(segmentsOf(100, 200, 5, runs).map(({ startS, stopS, isEvent }) => [startS, stopS, isEvent])).toEqual(segments);
-});
-
-test("a frame that was fetched by its time bends the line, and every index leads back to itself", () => {
-  const clock = new FrameClock(1000, 100_000);
-  expect([clock.indexOf(50_000), clock.msOf(500)]).toEqual([500, 50_000]);
-  clock.learn(200, 50_000);
-  expect([clock.msOf(200), clock.indexOf(25_000), clock.indexOf(75_000)]).toEqual([50_000, 100, 600]);
-  for (let index = 0; index < 1500; index += 7) expect(clock.indexOf(clock.msOf(index))).toBe(index);
-  // Knowledge that contradicts older knowledge takes its place.
-  clock.learn(300, 40_000);
-  expect(clock.msOf(300)).toBe(40_000);
-  expect(new FrameClock(0, 0).msOf(0)).toBe(0);
-});
-
-test("days are asked for in runs of 24 hours, cut where the clock is changed and at what the server answers at once", () => {
-  const day = 24 * kHourMs;
-  const spring = [0, day, 2 * day - kHourMs, 3 * day - kHourMs];
-  expect(questionsFor(spring)).toEqual([
-    { startMs: 0, count: 2 },
-    { startMs: 2 * day - kHourMs, count: 2 },
-  ]);
-  const many = Array.from({ length: 130 }, (_, index) => index * day);
-  expect(questionsFor(many).map(({ count }) => count)).toEqual([128, 2]);
-  const start = midnight(Date.UTC(2026, 2, 20, 15));
-  expect(midnights(start + kHourMs, start + 3 * day + 1)).toEqual([0, 1, 2, 3].map((days) => midnight(start, days)));
-});
-
-test("zooming leaves the time under the pointer in place, and ends at seconds and at a month", () => {
-  const scale = TimeScale.of(0, 24 * kHourMs, 1000);
-  expect(scale.zoomed(0.25, 300).msAt(300)).toBeCloseTo(scale.msAt(300));
-  expect(scale.zoomed(1e-9, 500).spanMs).toBe(15_000);
-  const widest = scale.zoomed(1e9, 500).spanMs / (24 * kHourMs);
-  expect([widest > 31, widest < 46]).toEqual([true, true]);
-  expect(scale.panned(100).startMs).toBe(-100 * scale.msPerPx);
-});
-
-test("marks on the axis never overlap and stay where they are while it is dragged, at every zoom", () => {
-  for (let msPerPx = 15; msPerPx < 4_000_000; msPerPx *= 1.7) {
-    const scale = new TimeScale(Date.UTC(2026, 2, 27), msPerPx, 1000);
-    const at = scale.ticks().map(({ atMs }) => atMs);
-    const apart = at.slice(1).map((ms, index) => (ms - at[index]!) / scale.msPerPx);
-    expect(Math.min(...apart, Infinity), `${msPerPx} ms a pixel`).toBeGreaterThan(60);
-    expect(at.length, `${msPerPx} ms a pixel`).toBeGreaterThan(1);
-    const moved = scale.panned(-37).ticks().map(({ atMs }) => atMs);
-    const common = at.filter((ms) => ms > scale.panned(-37).startMs);
-    expect(moved.slice(0, common.length)).toEqual(common);
-  }
-});
+import { Player } from "../../../client/src/playback/player";
+import { Recordings, type Footage } from "../../../client/src/wire/recordings";
+import { Server } from "../../../client/src/wire/server";
+import { FakeArchive } from "../support/fake_archive";
 
 describe("a player", () => {
   const archive = new FakeArchive();
@@ -164,7 +102,7 @@ describe("a player", () => {
   });
 
   test.each([
-    ["gone", () => (archive.recorded = []), "The recording is gone."],
+    ["gone", () => (archive.recorded = []), "The recording no longer exists."],
     ["not playable", () => (archive.recorded[0]!.frames = 0), "The recording cannot be played."],
   ])("a recording that is %s is named as such", async (_name, happens, reason) => {
     happens();

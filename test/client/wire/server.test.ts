@@ -1,10 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Answers of the server as the user gets to know them; file names; the arrangement of tiles.
+// Answers of the server as the user gets to see them, and what is sent to it.
 
-import { arrange } from "../../client/src/ui/wall/layout";
-import { snapshotFileName } from "../../client/src/ui/widgets/text";
-import { Server, type Camera } from "../../client/src/wire/server";
+import { Server, type Camera } from "../../../client/src/wire/server";
 
 const json = (status: number, body: unknown) =>
   new Response(JSON.stringify(body), { status, headers: { "Content-Type": "application/json" } });
@@ -20,35 +18,17 @@ const live = (server: Server) => server.live(kMjpeg, 1, new AbortController().si
 
 test.each([
   ["a handler's error with HTTP 200", cameras, () => json(200, failure(400)), "The server refused.", false],
-  [
-    "the host's own sentence",
-    cameras,
-    () => json(404, failure(404, "no such method")),
-    "The server refused: no such method.",
-    false,
-  ],
+  ["the host's own sentence", cameras, () => json(404, failure(404, "no such method")), "The server refused: no such method.", false],
   ["a proxy's error page", cameras, () => html(502), "The server could not answer (502).", false],
-  ["JSON that is none", cameras, () => html(200), "The server's answer makes no sense.", false],
+  ["JSON that is none", cameras, () => html(200), "The server's answer is not valid.", false],
   ["JSON of another shape", cameras, () => json(200, []), "The server refused.", false],
   ["no connection", cameras, lost, "The server does not answer.", false],
   ["a session that ended", cameras, () => json(401, failure(401)), "You are not logged in.", true],
-  [
-    "a wrong password, which ends no session",
-    login,
-    () => json(401, failure(401)),
-    "The account or the password is wrong.",
-    false,
-  ],
+  ["a wrong password, which ends no session", login, () => json(401, failure(401)), "The account or the password is wrong.", false],
   ["throttled logins", login, () => html(429), "Too many attempts. Please wait a minute.", false],
   ["a snapshot without picture", snapshot, () => json(504, failure(504)), "The camera sends no picture.", false],
   ["a snapshot refused with HTTP 200", snapshot, () => json(200, failure(400)), "The server refused.", false],
-  [
-    "a camera that cannot be opened",
-    live,
-    () => json(502, failure(502, "the handler gave no answer")),
-    "No picture came.",
-    false,
-  ],
+  ["a camera that cannot be opened", live, () => json(502, failure(502, "the handler gave no answer")), "No picture was received.", false],
   ["a stream whose session ended", live, () => json(401, failure(401)), "You are not logged in.", true],
   ["a stream too many", live, () => json(503, failure(503)), "The server is busy.", false],
 ])("says what went wrong: %s", async (_name, call, answer, message, endsSession) => {
@@ -92,30 +72,4 @@ test("a request without an answer ends in time", async () => {
   await vi.advanceTimersByTimeAsync(3000);
   await failed;
   vi.useRealTimers();
-});
-
-test.each([
-  ["Entrance", "Entrance_2026-11-04_09-05-07.jpg"],
-  ["Hof / Süd  2", "Hof-Süd-2_2026-11-04_09-05-07.jpg"],
-  ["../../etc/passwd", "etc-passwd_2026-11-04_09-05-07.jpg"],
-  ['a:b*c?"<d>|\\\n', "a-b-c-d_2026-11-04_09-05-07.jpg"],
-  ["..", "camera_2026-11-04_09-05-07.jpg"],
-])("file name of a snapshot of %j", (name, file) => {
-  expect(snapshotFileName(name, new Date(2026, 10, 4, 9, 5, 7).getTime())).toBe(file);
-});
-
-test.each([
-  // tiles, choice, width × height, columns, width of a tile
-  [1, "auto", 1440, 850, 1, 1440],
-  [4, "auto", 1440, 850, 2, 698],
-  [9, "auto", 1440, 850, 3, 445],
-  [2, "auto", 700, 1200, 1, 700],
-  [64, "auto", 1440, 850, 5, 284],
-  [4, "2", 1440, 850, 2, 698],
-  [4, "3", 1440, 850, 3, 445],
-  [9, "1", 1440, 850, 1, 1440],
-  [9, "3", 390, 800, 1, 390],
-  [9, "3", 1440, 200, 3, 240],
-] as const)("%i tiles, layout %s, %i × %i", (tiles, choice, widthPx, heightPx, columns, tilePx) => {
-  expect(arrange(tiles, choice, { widthPx, heightPx, gapPx: 4, barPx: 30 })).toEqual({ columns, tilePx });
 });

@@ -3,8 +3,8 @@
 // The built client in a real browser: which connections it holds, what it says of a silent camera, keyboard and phone.
 
 import { execFileSync } from "node:child_process";
-import { Browser, hasBrowser, type Page } from "./browser";
-import { FakeServer } from "./fake_server";
+import { hasBrowser, type Page } from "../../support/browser";
+import { ServedClient, smallControls } from "../../support/served_client";
 
 /** Pictures of H.264 that are white for the first four of each 25, else black. */
 function flashes(): Buffer[] {
@@ -18,53 +18,29 @@ function flashes(): Buffer[] {
 }
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
-  const server = new FakeServer();
-  let browser: Browser;
-  let address: string;
+  const client = new ServedClient();
+  const { server } = client;
 
-  beforeAll(async () => {
-    browser = new Browser();
-    address = await server.start();
-    const page = await browser.open(address, 100, 100);
-    const picture = await page.run(() => {
-      const canvas = Object.assign(document.createElement("canvas"), { width: 640, height: 360 });
-      return canvas.toDataURL("image/jpeg").split(",")[1]!;
-    });
-    server.jpeg = Buffer.from(picture, "base64");
+  beforeAll(() => {
     server.muxed.set(12, { type: "H264", pictures: flashes(), isLoud: (number) => number % 25 < 4 });
     const unplayable = Buffer.from("0000000142010101600000030090000003000003003fa0050201000000012601af", "hex");
     server.muxed.set(13, { type: "H265", pictures: [unplayable], isLoud: () => false });
-    await page.send("Page.close", {});
-  }, 30_000);
-
-  afterAll(async () => {
-    await browser.close();
-    server.close();
   });
 
-  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900, from = address): Promise<Page> {
+  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900, from = client.address): Promise<Page> {
     server.hasSession = false;
     server.stalled.clear();
     server.cameras.length = 0;
     for (const id of typeof cameras === "number" ? Array.from({ length: cameras }, (_, index) => index + 1) : cameras)
       server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: server.muxed.has(id) ? 3 : 1 });
-    const page = await browser.open(from, widthPx, heightPx);
-    await page.until(() => document.querySelector(".login") !== null);
-    await page.run(() => {
-      addEventListener("securitypolicyviolation", (event) => (document.title += ` ${event.violatedDirective}`));
-      document.querySelectorAll("input").forEach((input) => (input.value = "x"));
-    });
+    const page = await client.open(from, widthPx, heightPx);
+    await page.run(() => document.querySelectorAll("input").forEach((input) => (input.value = "x")));
     await page.press("Enter");
     await page.until(() => document.querySelector(".tile[data-state=live]") !== null);
     return page;
   }
 
   const open = (streams: string[]) => vi.waitFor(() => expect([...server.streams].sort()).toEqual(streams), 5000);
-
-  async function leave(page: Page): Promise<void> {
-    await page.send("Page.close", {});
-    await open([]);
-  }
 
   test("four tiles stream and the others poll in turns; what is not seen has no connection", async () => {
     const page = await loggedIn(9);
@@ -84,7 +60,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       document.dispatchEvent(new Event("visibilitychange"));
     });
     await open([]);
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 
   test("a silent camera is told from a live one, and comes back", async () => {
@@ -96,13 +72,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
         document.querySelector("[data-camera='3'] .message-sentence")!.textContent!,
       ),
     );
-    expect(await page.run(() => document.querySelector(".wall-count")!.textContent)).toBe(
+    expect(await page.run(() => document.querySelector(".bar-status")!.textContent)).toBe(
       "3 cameras · 1 without signal",
     );
     expect(await page.run(() => document.querySelector("[data-camera='1']")!.getAttribute("data-state"))).toBe("live");
     server.stalled.clear();
     await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 
   test("all can be done with keys; a snapshot opens over the picture and closes without leaving it", async () => {
@@ -123,8 +99,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.until(() => document.querySelector(".large[data-state=live]") !== null);
     await page.press("Escape");
     await page.until(() => document.activeElement?.closest(".tile")?.getAttribute("data-camera") === "2");
-    expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 
   test("all kinds of cameras side by side; sound on demand, and the picture in step with it", async () => {
@@ -150,14 +125,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       .slice(2)
       .map((heard) => Math.min(...seenMs.map((seen) => Math.abs(seen - Number(heard)))));
     expect(Math.max(...offsetsMs.sort((one, other) => one - other).slice(0, -1))).toBeLessThanOrEqual(80);
-    expect(await page.run(() => document.title), "violations of the policy").toBe("Lookhaven");
     await page.press("m");
     await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 
   test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
-    const page = await loggedIn([1, 12], 1440, 900, address.replace("127.0.0.1", "lan.test"));
+    const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
     await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 2);
     await open(["1/1"]);
     const link = (where: string) => document.querySelector<HTMLAnchorElement>(`${where} a`)?.href;
@@ -165,7 +139,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.click("[data-camera='12'] .tile-open");
     await page.until(() => document.querySelector(".large-state")!.textContent === "live, every 2 s");
     expect(await page.run(link, ".large .hint")).toBe("https://lan.test:8443/#camera=12");
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 
   test("logging out and a session that ends both lead to the login, with every stream closed", async () => {
@@ -179,7 +153,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await other.until(
       () => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.",
     );
-    await leave(other);
+    await client.leave(other);
   }, 40_000);
 
   test("a phone shows one column, and nothing too small for a finger", async () => {
@@ -187,17 +161,12 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const columns = () =>
       new Set([...document.querySelectorAll(".tile")].map((tile) => tile.getBoundingClientRect().left)).size;
     expect(await page.run(columns)).toBe(1);
-    const small = () =>
-      [...document.querySelectorAll("button, a")]
-        .filter((control) => control.getClientRects().length > 0)
-        .filter((control) => Math.min(control.clientWidth, control.clientHeight) < 44)
-        .map((control) => control.ariaLabel);
-    expect(await page.run(small)).toEqual([]);
+    expect(await page.run(smallControls, "button, a")).toEqual([]);
     await page.click(".tile-open");
     await page.until(() => document.querySelector(".large[data-state=live]") !== null);
-    expect(await page.run(small)).toEqual([]);
+    expect(await page.run(smallControls, "button, a")).toEqual([]);
     expect(await page.run(() => document.documentElement.scrollWidth)).toBe(390);
-    await leave(page);
+    await client.leave(page);
   }, 40_000);
 });
 
