@@ -7,7 +7,7 @@ import type { Footage, FootageKind, Runs } from "../wire/recordings";
 export interface Segment {
   startS: number;
   stopS: number;
-  /** Recorded as an event, beyond the recording log's mere coverage. */
+  /** Part of an event, not only recorded. */
   isEvent: boolean;
 }
 

@@ -6,7 +6,7 @@
 //               cameras. So time is cut into spans of fixed borders; those that reach the present are fetched again.
 
 import { ServerError } from "../wire/server";
-import type { Footage, FootageRef, Recordings } from "../wire/recordings";
+import type { Footage, Recordings } from "../wire/recordings";
 import { segmentsOf, type Segment } from "./coverage";
 import { RequestQueue } from "./request_queue";
 
@@ -80,11 +80,6 @@ export class FootageCache {
     if (this.#merged.size > 256) this.#merged.clear();
     this.#merged.set(key, answer);
     return answer;
-  }
-
-  /** What was fetched last of it. */
-  newest({ kind, id }: FootageRef, camera: number, startS: number): Footage | null {
-    return this.get(camera, startS, startS + 1).footage.find((one) => one.kind === kind && one.id === id) ?? null;
   }
 
   async #fetch(cameras: readonly number[], start: number): Promise<void> {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads a recording's frames out of the stream that plays it: a part with the index, then one with the picture.
+// Reads the frames of a recording's stream: of each a part with its number, then one with the picture.
 //
 // Why so        The next frames are read only when the last was taken. So a slow screen holds the server back through the
 //               connection, and the number that is shown is that of the frame on the screen.

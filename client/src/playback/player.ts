@@ -23,7 +23,7 @@ export type PlayerState =
   | { kind: "preempted" }
   | { kind: "failed"; reason: string };
 
-/** Below 0 slow motion by that factor; above 1 every so many-th frame is shown. */
+/** Below 0 slow motion by that factor; n above 1 shows every n-th frame. */
 export const kRates = [-8, -4, -2, 1, 2, 4, 8, 16] as const;
 
 const kTailDelayMs = 1_000;
@@ -78,7 +78,7 @@ export class Player {
     return (this.#footage?.start ?? 0) * 1000 + this.#clock.msOf(this.#index);
   }
 
-  /** Goes over to a recording, `sinceStartMs` after its beginning. */
+  /** Changes to a recording, `sinceStartMs` after its start. */
   open(footage: Footage, sinceStartMs: number, isPlaying: boolean): void {
     const isSame = this.#footage?.kind === footage.kind && this.#footage.id === footage.id;
     if (!isSame) this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
@@ -95,7 +95,7 @@ export class Player {
 
   pause(): void {
     if (this.#state.kind !== "playing" && this.#state.kind !== "opening") return;
-    // Before the first frame there is nothing that could stand still yet.
+    // Before the first frame there is no picture yet that could stay.
     if (this.#state.kind === "opening") return this.#showStill({ index: this.#index });
     this.#begin();
     this.#become({ kind: "paused" });
@@ -109,7 +109,7 @@ export class Player {
     if (index !== this.#index || this.#state.kind !== "paused") this.#showStill({ index });
   }
 
-  /** Follows a running stream; the picture shows no break where the server can do that. */
+  /** Changes a running stream, without interruption where the server can do that. */
   setRate(rate: number): void {
     if (rate === this.#rate) return;
     this.#rate = rate;
@@ -263,13 +263,13 @@ export class Player {
       this.#become({ kind: wasAtTail ? "ended" : "preempted" });
       return false;
     }
-    // At the end of what there is, no rate is faster than the camera.
+    // At the end of what is recorded so far, playback cannot be faster than the camera.
     if (footage.isGrowing && this.#rate > 1) this.#rate = 1;
     if (footage.isGrowing) await delay(kTailDelayMs, signal);
     return !signal.aborted;
   }
 
-  /** A recording that retention took away is told from one that cannot be played. */
+  /** Tells a recording that retention has deleted from one that cannot be played. */
   async #fail(error: ServerError, signal: AbortSignal): Promise<void> {
     let reason = error.message;
     if (error.status === kCannotPlay || error.status === 404) {

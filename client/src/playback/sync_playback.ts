@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Plays one or more cameras at the same time of the past, each in a player of its own, from recording to recording.
+// Plays recordings of one or more cameras in sync, each in a player of its own, from one recording to the next.
 //
 // Why so        Recordings of a camera follow each other without a gap, or with hours between. One player leads: its time is
-//               the playhead. Where its camera has no more, the playhead goes on to whatever comes next on any camera; the
-//               others join as soon as they have something at the playhead, and are brought back into step when they stray.
+//               the playhead. Where its camera has no more, the playhead moves on to whatever comes next on any camera; the
+//               others join as soon as they have something at the playhead, and are realigned when they drift apart.
 
 import type { Footage, Recordings } from "../wire/recordings";
 import { firstEndingAfter } from "./coverage";
@@ -16,7 +16,7 @@ export interface Track {
   readonly player: Player;
 }
 
-/** Recordings this close to each other are one to the user. */
+/** Recordings this close to each other play as one. */
 const kMaxGapS = 3;
 /** How far a player may be from the playhead, and how often at most it is brought back. */
 const kMaxApartMs = 1_500;
@@ -66,7 +66,7 @@ export class SyncPlayback {
     return this.#rate;
   }
 
-  /** Shows these cameras, in this order; those that stay go on. */
+  /** Plays these cameras, in this order; those that stay play on. */
   setCameras(cameras: readonly number[]): void {
     const before = this.#tracks;
     this.#tracks = cameras.map((camera) => before.find((track) => track.camera === camera) ?? this.#newTrack(camera));
@@ -121,7 +121,7 @@ export class SyncPlayback {
     this.#changed();
   }
 
-  /** Moves the standing picture by frames of the leading camera. */
+  /** Pauses, and moves by frames of the leading camera. */
   step(by: number): void {
     if (!this.#lead) return;
     if (this.#isPlaying) this.pause();
@@ -134,7 +134,7 @@ export class SyncPlayback {
     this.#changed();
   }
 
-  /** Call it a few times a second: lets the cameras that have something join, and keeps them in step. */
+  /** Call it a few times a second: lets cameras join, and realigns those that have drifted. */
   tick(): void {
     const playheadMs = this.#playheadMs;
     if (!this.#isPlaying || playheadMs === null) return;

@@ -7,7 +7,7 @@ import { iconButton } from "../widgets/button";
 import { notify } from "../widgets/notice";
 import type { Session } from "./screen";
 
-/** Nothing happens where `canLeave` says no. `showBusy` is told when a log-out begins and when it failed. */
+/** Does nothing where `canLeave` returns false. `showBusy` is called when a log-out begins (true) and when it failed (false). */
 export function logOutButton(
   { server, account, onLogOut }: Session,
   canLeave: () => boolean,

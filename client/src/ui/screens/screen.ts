@@ -17,7 +17,7 @@ const kClockMs = 500;
 export interface Session {
   readonly server: Server;
   readonly account: Account;
-  /** The session has ended on the user's demand. */
+  /** Called when the user has logged out. */
   readonly onLogOut: () => void;
 }
 
@@ -66,7 +66,7 @@ export abstract class Screen {
     return this.#closing.signal;
   }
 
-  /** Between the navigation and the clock. */
+  /** Adds to the bar, between navigation and clock. */
   protected addToBar(...nodes: Node[]): void {
     this.#clock.before(...nodes);
   }

@@ -76,11 +76,6 @@ export class TimeScale {
     return new TimeScale(this.startMs - px * this.msPerPx, this.msPerPx, this.widthPx);
   }
 
-  /** The same start and zoom on a screen of another width. */
-  resized(widthPx: number): TimeScale {
-    return new TimeScale(this.startMs, this.msPerPx, widthPx);
-  }
-
   ticks(): Tick[] {
     const stepMs = kSteps.find((step) => step / this.msPerPx >= kLabelPx) ?? kSteps.at(-1)!;
     return stepMs < kHourMs ? this.#fineTicks(stepMs) : this.#localTicks(stepMs);

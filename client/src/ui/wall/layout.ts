@@ -2,9 +2,9 @@
 //
 // The layouts of the wall: how many columns, and how wide a tile is.
 
-export type LayoutChoice = "auto" | "1" | "2" | "3";
-
-export const kLayoutChoices: readonly LayoutChoice[] = ["auto", "1", "2", "3"];
+/** All cameras on the screen, or so many columns and rows. */
+export const kLayoutChoices = ["auto", "1", "2", "3"] as const;
+export type LayoutChoice = (typeof kLayoutChoices)[number];
 
 export interface Space {
   widthPx: number;

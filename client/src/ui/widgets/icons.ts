@@ -45,7 +45,6 @@ const kShapes = {
   turnLeft: "M5 5v5h5 M5.5 10a7.5 7.5 0 1 1-.8 5",
   turnRight: "M19 5v5h-5 M18.5 10a7.5 7.5 0 1 0 .8 5",
   remove: "M5 7h14 M9.5 7V4.5h5V7 M6.5 7l1 13h9l1-13 M10 11v5.5 M14 11v5.5",
-  add: "M12 5v14 M5 12h14",
   fit: "M4 9V4h5 M20 9V4h-5 M4 15v5h5 M20 15v5h-5 M9 9h6v6H9Z",
   layoutAuto: "M4 4h9.5v16H4Z M17 4h3v5h-3Z M17 12.5h3V20h-3Z",
   layout1: "M4 5h16v14H4Z",
