@@ -4,8 +4,8 @@
 
 import { AudibleClock, TimestampMatcher } from "./av_clock";
 import type { MediaPart } from "./media_part";
-import workletAddress from "./speaker_worklet.ts?worker&url";
 import type { SpeakerCommand, SpeakerReport } from "./speaker_worklet";
+import workletAddress from "./speaker_worklet.ts?worker&url";
 
 export type AudioPart = Extract<MediaPart, { kind: "audio" }>;
 

@@ -39,7 +39,7 @@ export class SignalMonitor {
     this.#clock = clock;
   }
 
-  /** Watching begins, or goes on with another limit when it had begun. */
+  /** Starts watching, or continues with another limit. */
   begin(lostAfterMs: number): void {
     this.#lostAfterMs = lostAfterMs;
     if (this.#watching) return;

@@ -3,9 +3,9 @@
 // Live pictures of a camera by polling for snapshots: for tiles without a stream of their own.
 
 import { delay } from "../wire/delay";
+import type { Semaphore } from "../wire/semaphore";
 import type { Camera, Server } from "../wire/server";
 import type { Frame, LiveSource } from "./source";
-import type { Semaphore } from "../wire/semaphore";
 
 /** Short, since a camera that does not answer must not hold up the others. */
 const kAnswerTimeoutMs = 3_000;

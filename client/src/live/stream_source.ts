@@ -11,10 +11,10 @@
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
 import { kVideoTypeMjpeg, ServerError, type Camera, type Server } from "../wire/server";
-import { captureOf, mediaOf } from "./media_part";
-import { missingDecoder, type Unplayable } from "./unplayable";
 import type { AudioPlayer } from "./audio_player";
+import { captureOf, mediaOf } from "./media_part";
 import type { Frame, LiveSource } from "./source";
+import { missingDecoder, type Unplayable } from "./unplayable";
 import { VideoPlayer } from "./video_player";
 
 /** The profile of small pictures, of cameras that have one. */

@@ -3,12 +3,12 @@
 // Decodes compressed video and shows its frames: at once, or in sync with the audio while that is audible.
 
 import { frameInfoOf, type VideoCodec } from "./annexb";
+import type { AudioPlayer } from "./audio_player";
 import { FrameQueue } from "./av_clock";
 import { FrameGate } from "./frame_gate";
 import type { Capture } from "./media_part";
-import { kUndecodable, unsupported, type Unplayable } from "./unplayable";
-import type { AudioPlayer } from "./audio_player";
 import type { Frame } from "./source";
+import { kUndecodable, unsupported, type Unplayable } from "./unplayable";
 
 /** Damage now and then is no reason to give up a stream. */
 const kMaxErrors = 3;

@@ -3,11 +3,11 @@
 // Plays one recording after another in one place on the screen: play, pause, step, seek, rate.
 //
 // Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream, and
-//               everything that moves opens another. While the picture stands still there is no connection at all. A held
+//               every seek opens another. While paused there is no connection at all. A held
 //               key or a dragged playhead asks for more frames than can be fetched: then only the last is.
 //
 //               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
-//               recording that still grows goes on as it grows, and ends with it.
+//               growing recording continues as it grows, and ends with it.
 
 import { delay } from "../wire/delay";
 import { newStreamKey, type Footage, type Recordings, type Start } from "../wire/recordings";

@@ -18,7 +18,7 @@ export interface MapItem {
   x: number;
   y: number;
   direction: number;
-  /** Where the name stands: 0 below, 1 above, 2 left, 3 right. */
+  /** Where the name is shown: 0 below, 1 above, 2 left, 3 right. */
   textPos: number;
   iconCenterX: number;
   iconCenterY: number;

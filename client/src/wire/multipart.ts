@@ -46,7 +46,7 @@ export class MultipartParser {
     this.#deliver = deliver;
   }
 
-  /** Takes the next bytes of the body. Throws MultipartError; the parser is of no use after that. */
+  /** Takes the next bytes of the body. Throws MultipartError; do not use the parser after that. */
   push(chunk: Uint8Array): void {
     let at = 0;
     while (at < chunk.length && !this.#ended) {

@@ -43,9 +43,7 @@ test.each<[string, pushed: number[], heardMs: number | null, shown: number | nul
   const gone: number[] = [];
   const queue = new FrameQueue(() => undefined);
   for (const ms of pushed) queue.push({ timestamp: ms * 1000, close: () => gone.push(ms) });
-  expect(queue.take(heardMs === null ? null : heardMs * 1000, 0)?.timestamp ?? null).toBe(
-    shown === null ? null : shown * 1000,
-  );
+  expect(queue.take(heardMs === null ? null : heardMs * 1000, 0)?.timestamp ?? null).toBe(shown === null ? null : shown * 1000);
   expect(gone).toEqual(closed);
 });
 

@@ -52,10 +52,7 @@ test.each([
   for (let run = 0; run < 2; run += 1) {
     const failed = await source
       .run(() => undefined, new AbortController().signal)
-      .then(
-        () => false,
-        () => true,
-      );
+      .then(() => false, () => true);
     expect(failed).toBe(working.length === 0);
   }
   expect(fake.asked).toEqual(asked);

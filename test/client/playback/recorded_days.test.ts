@@ -9,10 +9,7 @@ const kHourMs = 3_600_000;
 test("days are asked for in runs of 24 hours, cut where the clock is changed and at what the server answers at once", () => {
   const day = 24 * kHourMs;
   const spring = [0, day, 2 * day - kHourMs, 3 * day - kHourMs];
-  expect(requestsFor(spring)).toEqual([
-    { startMs: 0, count: 2 },
-    { startMs: 2 * day - kHourMs, count: 2 },
-  ]);
+  expect(requestsFor(spring)).toEqual([{ startMs: 0, count: 2 }, { startMs: 2 * day - kHourMs, count: 2 }]);
   const many = Array.from({ length: 130 }, (_, index) => index * day);
   expect(requestsFor(many).map(({ count }) => count)).toEqual([128, 2]);
   const start = midnight(Date.UTC(2026, 2, 20, 15));

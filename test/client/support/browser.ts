@@ -88,10 +88,7 @@ export class Page {
   }
 
   /** Runs a function in the page; it sees its arguments and the page, nothing around it here. */
-  async run<Arguments extends unknown[], Result>(
-    work: (...given: Arguments) => Result,
-    ...given: Arguments
-  ): Promise<Awaited<Result>> {
+  async run<Arguments extends unknown[], Result>(work: (...given: Arguments) => Result, ...given: Arguments): Promise<Awaited<Result>> {
     const expression = `(${String(work)})(...${JSON.stringify(given)})`;
     const how = { expression, awaitPromise: true, returnByValue: true, userGesture: true };
     const { result, exceptionDetails } = await this.send("Runtime.evaluate", how);
@@ -119,11 +116,4 @@ export class Page {
 }
 
 /** Chromium acts by itself only on keys that come with their number. */
-const kCodes: Record<string, number> = {
-  Enter: 13,
-  Escape: 27,
-  ArrowLeft: 37,
-  ArrowUp: 38,
-  ArrowRight: 39,
-  ArrowDown: 40,
-};
+const kCodes: Record<string, number> = { Enter: 13, Escape: 27, ArrowLeft: 37, ArrowUp: 38, ArrowRight: 39, ArrowDown: 40 };

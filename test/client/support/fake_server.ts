@@ -14,12 +14,7 @@ import { FakeArchive } from "./fake_archive";
 const kPolicy =
   "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
   "frame-ancestors 'none'; require-trusted-types-for 'script'";
-const kTypes: Record<string, string> = {
-  ".html": "text/html",
-  ".js": "text/javascript",
-  ".css": "text/css",
-  ".svg": "image/svg+xml",
-};
+const kTypes: Record<string, string> = { ".html": "text/html", ".js": "text/javascript", ".css": "text/css", ".svg": "image/svg+xml" };
 const kFrameMs = 50;
 /** 40 ms of sound at 8 kHz, µ-law. */
 const kTone = Array.from({ length: 320 }, (_, sample) => (sample % 8 < 4 ? 0x90 : 0x10));
@@ -46,13 +41,7 @@ export class FakeServer {
 
   async start(): Promise<string> {
     const client = join(__dirname, "../../../client");
-    const vite = [
-      "node_modules/vite/bin/vite.js",
-      "build",
-      "--logLevel=error",
-      "--emptyOutDir",
-      `--outDir=${this.#files}`,
-    ];
+    const vite = ["node_modules/vite/bin/vite.js", "build", "--logLevel=error", "--emptyOutDir", `--outDir=${this.#files}`];
     execFileSync(process.execPath, vite, { cwd: client, env: { ...process.env, NODE_ENV: "production" } });
     await new Promise<void>((resolve) => this.#server.listen(0, "127.0.0.1", resolve));
     return `http://127.0.0.1:${(this.#server.address() as AddressInfo).port}/`;
@@ -78,14 +67,7 @@ export class FakeServer {
       return void this.#recordings(searchParams, request, answer);
     }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
-    const list = {
-      camera,
-      selected: 1,
-      isManager: true,
-      ShowAll: 1,
-      CamNum: camera.length,
-      EnableCamNum: camera.length,
-    };
+    const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
     json(answer, 200, {
       success: true,
       data:
@@ -157,11 +139,7 @@ export class FakeServer {
 }
 
 function part(head: string, body: Buffer): Buffer {
-  return Buffer.concat([
-    Buffer.from(`${head}Content-Length: ${body.length}\r\n\r\n`),
-    body,
-    Buffer.from("\r\n--b\r\n"),
-  ]);
+  return Buffer.concat([Buffer.from(`${head}Content-Length: ${body.length}\r\n\r\n`), body, Buffer.from("\r\n--b\r\n")]);
 }
 
 function json(answer: ServerResponse, status: number, body: unknown): void {

@@ -20,7 +20,7 @@ export class ServedClient {
       this.server.jpeg = pictures[8]!;
       this.server.archive.picture = (index) => pictures[index % 16]!;
       await page.send("Page.close", {});
-    }, 30_000);
+    }, 60_000);
     afterAll(async () => {
       await this.#browser.close();
       this.server.close();

@@ -66,9 +66,7 @@ test("a request without an answer ends in time", async () => {
   vi.stubGlobal("fetch", (_address: string, { signal }: RequestInit) => {
     return new Promise((_resolve, reject) => signal!.addEventListener("abort", () => reject(signal!.reason)));
   });
-  const failed = expect(new Server(() => undefined).snapshot(kMjpeg, undefined, 3000)).rejects.toThrow(
-    "does not answer",
-  );
+  const failed = expect(new Server(() => undefined).snapshot(kMjpeg, undefined, 3000)).rejects.toThrow("does not answer");
   await vi.advanceTimersByTimeAsync(3000);
   await failed;
   vi.useRealTimers();

@@ -2,8 +2,8 @@
 //
 // One camera over the whole window, at the camera's full picture.
 
-import { SnapshotSource } from "../../live/snapshot_source";
 import { AudioPlayer } from "../../live/audio_player";
+import { SnapshotSource } from "../../live/snapshot_source";
 import { StreamSource } from "../../live/stream_source";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
@@ -11,8 +11,8 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { notify } from "../widgets/notice";
-import { LivePicture } from "./live_picture";
 import { signalText } from "../widgets/text";
+import { LivePicture } from "./live_picture";
 
 export interface LargeViewActions {
   back(): void;
@@ -61,27 +61,7 @@ export class LargeView {
     this.#back = iconButton("back", "Back to all cameras", () => actions.back(), "Esc");
     this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundLabel);
     this.#soundButton.addEventListener("click", () => this.toggleSound());
-    const stepButtons = [
-      iconButton("previous", "Previous camera", () => actions.step?.(-1), "←"),
-      iconButton("next", "Next camera", () => actions.step?.(1), "→"),
-    ];
-    const buttons = [
-      this.#soundButton,
-      ...(actions.step ? stepButtons : []),
-      iconButton("snapshot", "Snapshot", () => actions.snapshot(), "S"),
-      iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
-    ];
-    const bar = element(
-      "header",
-      { class: "bar" },
-      this.#back,
-      element("span", { class: "dot" }),
-      element("h1", { class: "large-name" }, camera.name),
-      this.#state,
-      this.#description,
-      element("div", { class: "large-buttons" }, ...buttons),
-    );
-    this.root = element("section", { class: "large", "aria-label": camera.name }, bar, this.#picture.root);
+    this.root = element("section", { class: "large", "aria-label": camera.name }, this.#bar(), this.#picture.root);
     document.addEventListener("visibilitychange", this.#onVisibility);
     this.#playIfVisible();
     this.#picture.refresh();
@@ -137,6 +117,29 @@ export class LargeView {
     if (this.#audio.error) notify(`${this.#audio.error}.`);
     if (this.#audio.isOn) this.#audio.switchOff();
     else void this.#audio.switchOn();
+  }
+
+  #bar(): HTMLElement {
+    const stepButtons = [
+      iconButton("previous", "Previous camera", () => this.#actions.step?.(-1), "←"),
+      iconButton("next", "Next camera", () => this.#actions.step?.(1), "→"),
+    ];
+    const buttons = [
+      this.#soundButton,
+      ...(this.#actions.step ? stepButtons : []),
+      iconButton("snapshot", "Snapshot", () => this.#actions.snapshot(), "S"),
+      iconButton("fullScreen", "Full screen", () => this.#actions.fullScreen(), "F"),
+    ];
+    return element(
+      "header",
+      { class: "bar" },
+      this.#back,
+      element("span", { class: "dot" }),
+      element("h1", { class: "large-name" }, this.camera.name),
+      this.#state,
+      this.#description,
+      element("div", { class: "large-buttons" }, ...buttons),
+    );
   }
 
   #playIfVisible(): void {

@@ -3,12 +3,12 @@
 // One camera's live picture, with the message that lies over it while it is not live; used by tiles and the large view.
 
 import { Feed } from "../../live/feed";
-import type { Unplayable } from "../../live/unplayable";
 import type { SignalState } from "../../live/signal_state";
-import { unplayableHint } from "./unplayable_hint";
+import type { Unplayable } from "../../live/unplayable";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { signalText } from "../widgets/text";
+import { unplayableHint } from "./unplayable_hint";
 
 /** Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. */
 export type PictureState = SignalState | { kind: "unavailable"; reason: string };

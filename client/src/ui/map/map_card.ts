@@ -6,8 +6,8 @@ import { SnapshotSource } from "../../live/snapshot_source";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { draw, element, setText } from "../widgets/dom";
-import { kindName, type MapItemView } from "./map_item";
 import { clockTime, shortDate } from "../widgets/text";
+import { kindName, type MapItemView } from "./map_item";
 
 export class MapCard {
   readonly root = element("aside", { class: "map-card", hidden: true });

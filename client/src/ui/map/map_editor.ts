@@ -6,13 +6,13 @@ import type { EditedMap, Emaps, MapItem, Placeable } from "../../wire/emaps";
 import { asServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element } from "../widgets/dom";
+import { notify } from "../widgets/notice";
 import { conflictBar } from "./conflict_bar";
 import { EditHistory } from "./edit_history";
 import { makeDraggable } from "./item_drag";
 import { newItem, titleOf, type MapItemView } from "./map_item";
 import { kTurnDegrees, MapItemForm, turned } from "./map_item_form";
 import { MapView } from "./map_view";
-import { notify } from "../widgets/notice";
 
 const kFarStep = 10;
 

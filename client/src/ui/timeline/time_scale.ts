@@ -71,7 +71,7 @@ export class TimeScale {
     return new TimeScale(this.msAt(px) - px * zoomed.msPerPx, zoomed.msPerPx, this.widthPx);
   }
 
-  /** The content moves to the right by so much. */
+  /** The content moved to the right. */
   panned(px: number): TimeScale {
     return new TimeScale(this.startMs - px * this.msPerPx, this.msPerPx, this.widthPx);
   }

@@ -5,8 +5,8 @@
 // Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of the one
 //               before are left out, and each colour is filled once, so that dragging is smooth.
 
-import { midnights } from "../../playback/recorded_days";
 import { firstEndingAfter, kindOf, type EventKind, type Segment } from "../../playback/coverage";
+import { midnights } from "../../playback/recorded_days";
 import type { Footage, FootageRef } from "../../wire/recordings";
 import type { TimeScale } from "./time_scale";
 

@@ -109,7 +109,7 @@ export class Grid {
     return lost;
   }
 
-  /** Closes all streams; the grid is of no use after that. */
+  /** Closes all streams; do not use the grid after that. */
   close(): void {
     clearTimeout(this.#settling);
     document.removeEventListener("visibilitychange", this.#assignSoon);

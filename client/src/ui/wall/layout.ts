@@ -2,7 +2,7 @@
 //
 // The layouts of the wall: how many columns, and how wide a tile is.
 
-/** All cameras on the screen, or so many columns and rows. */
+/** All cameras on the screen, or this many columns and rows. */
 export const kLayoutChoices = ["auto", "1", "2", "3"] as const;
 export type LayoutChoice = (typeof kLayoutChoices)[number];
 

@@ -2,14 +2,14 @@
 //
 // One camera on the wall: its picture, and below it a bar with state, name and snapshot button.
 
-import type { Unplayable } from "../../live/unplayable";
 import { SnapshotSource } from "../../live/snapshot_source";
 import { StreamSource } from "../../live/stream_source";
+import type { Unplayable } from "../../live/unplayable";
 import type { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
+import { LivePicture, type PictureState } from "../camera/live_picture";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
-import { LivePicture, type PictureState } from "../camera/live_picture";
 import { signalText } from "../widgets/text";
 
 /** How a tile gets its pictures. */

@@ -68,13 +68,9 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
     server.stalled.add(3);
     await page.until(() =>
-      /^No signal since \d\d:\d\d:\d\d$/.test(
-        document.querySelector("[data-camera='3'] .message-sentence")!.textContent!,
-      ),
+      /^No signal since \d\d:\d\d:\d\d$/.test(document.querySelector("[data-camera='3'] .message-sentence")!.textContent!),
     );
-    expect(await page.run(() => document.querySelector(".bar-status")!.textContent)).toBe(
-      "3 cameras · 1 without signal",
-    );
+    expect(await page.run(() => document.querySelector(".bar-status")!.textContent)).toBe("3 cameras · 1 without signal");
     expect(await page.run(() => document.querySelector("[data-camera='1']")!.getAttribute("data-state"))).toBe("live");
     server.stalled.clear();
     await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
@@ -89,9 +85,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const shown = () => document.querySelector(".large-name")?.textContent ?? "";
     await vi.waitFor(async () => expect(await page.run(shown)).toBe("Camera <b>3</b>"));
     await page.press("s");
-    await page.until(
-      () => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false,
-    );
+    await page.until(() => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false);
     await page.press("Escape");
     await page.until(() => !document.querySelector("dialog")!.open);
     await page.press("ArrowLeft");
@@ -150,9 +144,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.send("Page.close", {});
     const other = await loggedIn(4);
     server.hasSession = false;
-    await other.until(
-      () => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.",
-    );
+    await other.until(() => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.");
     await client.leave(other);
   }, 40_000);
 
