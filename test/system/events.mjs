@@ -27,20 +27,22 @@ await visit(async (page, complaints) => {
   const timeAt = async (x) => {
     await page.mouse.click(box.x + x, y);
     await page.waitForTimeout(400);
-    const words = (await text(".transport-time")) || (await text(".message-sentence"));
-    const [, hours, minutes, seconds] = /(\d\d):(\d\d):(\d\d)/.exec(words);
-    return day + hours * 3600 + minutes * 60 + Number(seconds);
+    const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
+    return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time}`) / 1000;
   };
-  // The day fills the width; from there the wheel goes to the seconds, and each look corrects the last.
-  let x = (box.width * (middle - day)) / 86_400;
-  let scale = Infinity;
-  while (scale > 0.2) {
-    await page.mouse.move(box.x + x, y);
-    for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
+  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, go on towards the
+  // seconds with the wheel, and look again.
+  let x = box.width / 2;
+  let scale;
+  const aim = async () => {
     const away = x < box.width / 2 ? 400 : -400;
     const [here, there] = [await timeAt(x), await timeAt(x + away)];
     scale = (there - here) / away;
     x += (middle - here) / scale;
+  };
+  for (await aim(); scale > 0.2; await aim()) {
+    await page.mouse.move(box.x + x, y);
+    for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
   }
   await timeAt(x);
   await settled("playing");

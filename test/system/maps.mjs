@@ -57,7 +57,7 @@ await visit(async (page, complaints) => {
   await page.keyboard.press("ArrowRight");
   await page.getByRole("button", { name: "Save", exact: true }).click();
   await page.getByRole("alert").filter({ hasText: "Someone else" }).waitFor();
-  await page.getByRole("button", { name: "Save mine over it" }).click();
+  await page.getByRole("button", { name: "Overwrite with mine" }).click();
   await page.getByRole("alert").filter({ hasText: "Someone else" }).waitFor({ state: "hidden" });
   await report("saved over", { saved: await place(till) });
   await page.getByRole("button", { name: "Done" }).click();

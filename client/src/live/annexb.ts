@@ -1,44 +1,44 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads of an H.264 or H.265 picture in Annex B form what a decoder has to be told: whether it is a key frame, and the
-// name of the codec's variant.
+// Reads from an H.264 or H.265 frame in Annex B format what a decoder has to be told: whether it is a key frame, and the
+// codec string.
 //
-// Why so        The stream does not mark key frames, and a decoder starts at none but a true one (IDR, or the random access
-//               pictures of H.265); so the kinds of the units are looked at, which stand in clear in their first byte.
+// Why so        The stream does not mark key frames, and a decoder can only start at one (IDR, or the random access frames
+//               of H.265); so the types of the NAL units are read from their first byte.
 
 export type VideoCodec = "H264" | "H265";
 
-export interface PictureFacts {
+export interface FrameInfo {
   isKey: boolean;
-  /** As VideoDecoder wants it, out of the picture's own parameter set; null for a picture without one. */
+  /** For VideoDecoder, from the frame's own sequence parameter set; null for a frame without one. */
   codecString: string | null;
 }
 
 const kH264 = { idr: 5, parameterSet: 7 };
 const kH265 = { firstRandomAccess: 16, lastRandomAccess: 21, parameterSet: 33 };
-/** Enough for what is read of a parameter set. */
+/** As much as is read of a parameter set. */
 const kReadBytes = 32;
 
-export function factsOf(codec: VideoCodec, picture: Uint8Array): PictureFacts {
-  const facts: PictureFacts = { isKey: false, codecString: null };
-  for (let at = nextUnit(picture, 0); at < picture.length; at = nextUnit(picture, at)) {
-    const first = picture[at]!;
-    const kind = codec === "H264" ? first & 0x1f : (first >> 1) & 0x3f;
+export function frameInfoOf(codec: VideoCodec, frame: Uint8Array): FrameInfo {
+  const info: FrameInfo = { isKey: false, codecString: null };
+  for (let at = nextUnit(frame, 0); at < frame.length; at = nextUnit(frame, at)) {
+    const first = frame[at]!;
+    const type = codec === "H264" ? first & 0x1f : (first >> 1) & 0x3f;
     if (codec === "H264") {
-      facts.isKey ||= kind === kH264.idr;
-      if (kind === kH264.parameterSet) facts.codecString = h264String(unescaped(picture, at));
-      // What follows a slice of the picture is more slices, most of the bytes.
-      if (kind >= 1 && kind <= kH264.idr) break;
+      info.isKey ||= type === kH264.idr;
+      if (type === kH264.parameterSet) info.codecString = h264String(unescaped(frame, at));
+      // What follows a slice of the frame is more slices, most of the bytes.
+      if (type >= 1 && type <= kH264.idr) break;
     } else {
-      facts.isKey ||= kind >= kH265.firstRandomAccess && kind <= kH265.lastRandomAccess;
-      if (kind === kH265.parameterSet) facts.codecString = h265String(unescaped(picture, at));
-      if (kind < 32) break;
+      info.isKey ||= type >= kH265.firstRandomAccess && type <= kH265.lastRandomAccess;
+      if (type === kH265.parameterSet) info.codecString = h265String(unescaped(frame, at));
+      if (type < 32) break;
     }
   }
-  return facts;
+  return info;
 }
 
-/** Where the unit after the next start code begins; the length of the bytes when there is none. */
+/** Where the NAL unit after the next start code begins; the length of the bytes when there is none. */
 function nextUnit(bytes: Uint8Array, from: number): number {
   for (let at = bytes.indexOf(1, from + 2); at >= 0; at = bytes.indexOf(1, at + 1)) {
     if (bytes[at - 1] === 0 && bytes[at - 2] === 0) return at + 1;
@@ -46,7 +46,7 @@ function nextUnit(bytes: Uint8Array, from: number): number {
   return bytes.length;
 }
 
-/** The first bytes of a unit, without the threes that keep start codes out of it. */
+/** The first bytes of a NAL unit, without its emulation prevention bytes. */
 function unescaped(bytes: Uint8Array, at: number): number[] {
   const plain: number[] = [];
   for (let zeros = 0; plain.length < kReadBytes && at < bytes.length; at += 1) {
@@ -62,12 +62,12 @@ function unescaped(bytes: Uint8Array, at: number): number[] {
 
 const hex = (byte: number) => byte.toString(16).padStart(2, "0");
 
-/** Profile, constraints and level stand right behind the unit's byte. */
+/** Profile, constraints and level follow the header of one byte. */
 function h264String(unit: number[]): string | null {
   return unit.length < 4 ? null : `avc1.${unit.slice(1, 4).map(hex).join("")}`;
 }
 
-/** As ISO 14496-15 Annex E writes it. Behind the unit's two bytes and one more stands the profile, tier and level. */
+/** In the format of ISO 14496-15 Annex E. Profile, tier and level follow the header of two bytes and one more. */
 function h265String(unit: number[]): string | null {
   if (unit.length < 15) return null;
   const profile = unit[3]!;

@@ -1,15 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps the picture in step with the sound: the clock of what is heard, and the decoded pictures that wait for it.
+// Keeps video in sync with audio: the clock of what is audible, and the decoded frames that wait for it.
 //
-// Why so        The ear notices a gap, the eye hardly a picture left out. So the sound runs through, and the picture
-//               follows. Without sound each picture is shown at once.
+// Why so        The ear notices a gap, the eye hardly a dropped frame. So the audio plays through, and the video follows it.
+//               Without audio each frame is shown at once.
 
-/** Reports come about twenty times a second while sound plays. */
+/** Reports come about twenty times a second while audio plays. */
 const kReportLimitMs = 500;
 
-/** Which moment of the stream is heard. */
-export class HeardClock {
+/** Which moment of the stream is audible. */
+export class AudibleClock {
   #playedUs = 0;
   #contextTime = 0;
   #reportedMs = Number.NEGATIVE_INFINITY;
@@ -21,29 +21,29 @@ export class HeardClock {
     this.#reportedMs = playedUs === null ? Number.NEGATIVE_INFINITY : nowMs;
   }
 
-  /** Stream time in µs of what is heard now, when `audibleTime` of the audio context is; null when nothing is. */
-  heardUs(audibleTime: number, nowMs: number): number | null {
+  /** Stream time in µs of what is audible now, at `audibleTime` of the audio context; null when nothing is. */
+  audibleUs(audibleTime: number, nowMs: number): number | null {
     if (nowMs - this.#reportedMs > kReportLimitMs) return null;
     return this.#playedUs + (audibleTime - this.#contextTime) * 1e6;
   }
 }
 
 /**
- * Finds for each decoded piece of sound the time that it was sent with.
+ * Finds for each decoded audio chunk the timestamp that it was sent with.
  *
- * Why so        Decoders count the time of their output on from their first input, by its samples. A camera's samples are
- *               never as long as they should be, so that count leaves the stream's time by seconds a day.
+ * Why so        Decoders derive the timestamps of their output from the first one and the number of samples since. A camera's
+ *               sample clock is never exact, so those drift away from the stream's timestamps by seconds a day.
  */
-export class SentTimes {
+export class TimestampMatcher {
   #sentUs: number[] = [];
-  /** What the count was behind for the last piece. */
+  /** How far the decoder's count was behind for the last chunk. */
   #behindUs = 0;
 
   sent(us: number): void {
     this.#sentUs.push(us);
   }
 
-  /** Of the times sent since the last piece, the one nearest to where the count would be. */
+  /** Of the timestamps sent since the last chunk, the one nearest to the corrected count. */
   decoded(countedUs: number): number {
     const expectedUs = countedUs + this.#behindUs;
     const distance = (us: number) => Math.abs(us - expectedUs);
@@ -60,67 +60,67 @@ export interface Timed {
   close(): void;
 }
 
-/** Decoders have few pictures to lend: rather one too early than none any more. */
-const kMostWaiting = 16;
-/** A picture so far ahead of the sound belongs to no sound that will come. */
-const kFarAheadUs = 1_000_000;
-const kLateUs = 40_000;
-/** What a burst of the network delays is made good sooner. */
-const kLateLimitMs = 1500;
+/** A decoder stalls when too many of its frames are held: rather show one too early. */
+const kMaxQueuedFrames = 16;
+/** A frame this far ahead of the audio belongs to no audio that will come. */
+const kMaxAheadUs = 1_000_000;
+const kToleratedLateUs = 40_000;
+/** A burst on the network is over sooner. */
+const kLateForMs = 1500;
 
-export class PictureQueue<Picture extends Timed> {
-  readonly #waiting: Picture[] = [];
-  readonly #askSoundToWait: (us: number) => void;
+export class FrameQueue<Frame extends Timed> {
+  readonly #queued: Frame[] = [];
+  readonly #postponeAudio: (us: number) => void;
   #lateSinceMs: number | null = null;
-  #leastLateUs = 0;
+  #minLateUs = 0;
 
-  /** `askSoundToWait` is called when pictures keep coming after their sound, by so many microseconds. */
-  constructor(askSoundToWait: (us: number) => void) {
-    this.#askSoundToWait = askSoundToWait;
+  /** `postponeAudio` is called when frames keep coming later than their audio, with by how many microseconds. */
+  constructor(postponeAudio: (us: number) => void) {
+    this.#postponeAudio = postponeAudio;
   }
 
   get isEmpty(): boolean {
-    return this.#waiting.length === 0;
+    return this.#queued.length === 0;
   }
 
-  push(picture: Picture): void {
-    this.#waiting.push(picture);
+  push(frame: Frame): void {
+    this.#queued.push(frame);
   }
 
   /**
-   * The picture to show at `heardUs` (null: nothing is heard, so the newest); null while none is due. Closes those that
-   * are too late beside it; the caller closes the one returned.
+   * The frame to show at `audibleUs` (null: nothing is audible, so the newest); null while none is due. Closes the frames
+   * that it overtakes; the caller closes the one returned.
    */
-  take(heardUs: number | null, nowMs: number): Picture | null {
-    const isDue = ({ timestamp }: Picture) =>
-      heardUs === null ||
-      this.#waiting.length > kMostWaiting ||
-      timestamp <= heardUs ||
-      timestamp > heardUs + kFarAheadUs;
-    let due: Picture | null = null;
-    while (this.#waiting[0] && isDue(this.#waiting[0])) {
+  take(audibleUs: number | null, nowMs: number): Frame | null {
+    const isDue = ({ timestamp }: Frame) =>
+      audibleUs === null ||
+      this.#queued.length > kMaxQueuedFrames ||
+      timestamp <= audibleUs ||
+      timestamp > audibleUs + kMaxAheadUs;
+    let due: Frame | null = null;
+    while (this.#queued[0] && isDue(this.#queued[0])) {
       due?.close();
-      due = this.#waiting.shift()!;
+      due = this.#queued.shift()!;
     }
-    if (due && heardUs !== null) this.#judge(heardUs - due.timestamp, nowMs);
+    if (due && audibleUs !== null) this.#checkLateness(audibleUs - due.timestamp, nowMs);
     return due;
   }
 
   clear(): void {
-    for (const picture of this.#waiting.splice(0)) picture.close();
+    for (const frame of this.#queued.splice(0)) frame.close();
   }
 
-  #judge(lateUs: number, nowMs: number): void {
-    if (lateUs <= kLateUs) {
+  #checkLateness(lateUs: number, nowMs: number): void {
+    if (lateUs <= kToleratedLateUs) {
       this.#lateSinceMs = null;
     } else if (this.#lateSinceMs === null) {
       this.#lateSinceMs = nowMs;
-      this.#leastLateUs = lateUs;
+      this.#minLateUs = lateUs;
     } else {
-      this.#leastLateUs = Math.min(this.#leastLateUs, lateUs);
-      if (nowMs - this.#lateSinceMs < kLateLimitMs) return;
+      this.#minLateUs = Math.min(this.#minLateUs, lateUs);
+      if (nowMs - this.#lateSinceMs < kLateForMs) return;
       this.#lateSinceMs = null;
-      this.#askSoundToWait(this.#leastLateUs);
+      this.#postponeAudio(this.#minLateUs);
     }
   }
 }

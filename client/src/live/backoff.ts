@@ -4,7 +4,7 @@
 // the tiles of many viewers do not all come back in the same moment after the server restarts.
 
 const kFirstMs = 1_000;
-const kLongestMs = 15_000;
+const kMaxMs = 15_000;
 const kSpread = 0.25;
 
 export class Backoff {
@@ -19,7 +19,7 @@ export class Backoff {
   /** The wait in milliseconds before the next attempt. */
   next(): number {
     const baseMs = this.#nextMs;
-    this.#nextMs = Math.min(baseMs * 2, kLongestMs);
+    this.#nextMs = Math.min(baseMs * 2, kMaxMs);
     return baseMs * (1 - kSpread + 2 * kSpread * this.#random());
   }
 

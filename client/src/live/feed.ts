@@ -1,21 +1,22 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps one picture on the screen live: runs a source, reconnects with growing waits, and judges the signal.
+// Keeps one picture on the screen live: runs a source, reconnects with growing delays, and watches the signal.
 
+import { delay } from "../wire/delay";
 import { ServerError } from "../wire/server";
 import { Backoff } from "./backoff";
-import { SignalJudge, type SignalState } from "./signal_state";
-import { pause, type Frame, type LiveSource } from "./source";
+import { SignalMonitor, type SignalState } from "./signal_state";
+import type { Frame, LiveSource } from "./source";
 
 export class Feed {
   readonly #show: (frame: Frame) => void;
   readonly #changed: () => void;
-  readonly #judge = new SignalJudge();
+  readonly #monitor = new SignalMonitor();
   #source: LiveSource | null = null;
   #run: AbortController | null = null;
   #failure: ServerError | null = null;
 
-  /** `show` draws and closes a frame; `changed` is told when the state may have changed by something other than time. */
+  /** `show` draws and closes a frame; `changed` is called when the state may have changed by something other than time. */
   constructor(show: (frame: Frame) => void, changed: () => void) {
     this.#show = show;
     this.#changed = changed;
@@ -33,10 +34,10 @@ export class Feed {
 
   /** Changes with time too: ask again about twice a second. */
   state(): SignalState {
-    return this.#judge.state();
+    return this.#monitor.state();
   }
 
-  /** Starts, or goes over to another source without losing what is known of the signal. */
+  /** Starts, or changes to another source without losing what is known of the signal. */
   play(source: LiveSource): void {
     if (source === this.#source) return;
     this.#run?.abort();
@@ -51,23 +52,23 @@ export class Feed {
   stop(): void {
     this.#run?.abort();
     this.#run = this.#source = null;
-    this.#judge.end();
+    this.#monitor.end();
     this.#changed();
   }
 
   async #keepRunning(source: LiveSource, signal: AbortSignal): Promise<void> {
     const backoff = new Backoff();
     const show = (frame: Frame) => {
-      const before = this.#judge.state().kind;
+      const before = this.#monitor.state().kind;
       backoff.reset();
       this.#failure = null;
-      this.#judge.picture(frame.capturedMs, frame.ageMs);
+      this.#monitor.picture(frame.capturedMs, frame.ageMs);
       this.#show(frame);
-      if (this.#judge.state().kind !== before) this.#changed();
+      if (this.#monitor.state().kind !== before) this.#changed();
     };
     while (!signal.aborted) {
-      // Sources may go over to another way of getting pictures from one attempt to the next.
-      this.#judge.begin(source.lostAfterMs);
+      // A source may get its pictures in another way from one attempt to the next.
+      this.#monitor.begin(source.lostAfterMs);
       let failure: ServerError | null = null;
       try {
         await source.run(show, signal);
@@ -76,9 +77,9 @@ export class Feed {
       }
       if (signal.aborted) return;
       this.#failure = failure;
-      this.#judge.broke(failure?.message ?? "");
+      this.#monitor.disconnected(failure?.message ?? "");
       this.#changed();
-      await pause(backoff.next(), signal);
+      await delay(backoff.next(), signal);
     }
   }
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A part of a live stream as what it carries: a JPEG picture, or a piece of compressed picture or sound.
+// What a part of a live stream carries: a JPEG picture, or a piece of compressed video or audio.
 
 import type { Part } from "../wire/multipart";
 import type { VideoCodec } from "./annexb";
@@ -15,7 +15,7 @@ export interface Capture {
 export type MediaPart =
   | { kind: "jpeg" }
   | { kind: "video"; codec: VideoCodec; timestampUs: number }
-  | { kind: "sound"; config: AudioDecoderConfig | null; codec: string; timestampUs: number };
+  | { kind: "audio"; config: AudioDecoderConfig | null; codec: string; timestampUs: number };
 
 /** Reads capture time and age of a part; a part without them counts as captured on arrival. */
 export function captureOf(headers: ReadonlyMap<string, string>, nowMs: number): Capture {
@@ -32,19 +32,19 @@ export function mediaOf({ headers }: Part): MediaPart | null {
   if (/^image\/jpeg\b/i.test(type)) return { kind: "jpeg" };
   if (medium === "image" && (codec === "H264" || codec === "H265")) return { kind: "video", codec, timestampUs };
   if (medium !== "audio") return null;
-  const config = soundConfig(codec, fromBase64(headers.get("x-audio-extra") ?? ""));
-  return { kind: "sound", config, codec, timestampUs };
+  const config = audioConfig(codec, fromBase64(headers.get("x-audio-extra") ?? ""));
+  return { kind: "audio", config, codec, timestampUs };
 }
 
-/** What AudioDecoder wants to know; null for a codec that is unknown, or whose configuration is missing or damaged. */
-export function soundConfig(codec: string, extra: Uint8Array): AudioDecoderConfig | null {
+/** For AudioDecoder; null for a codec that is unknown, or whose configuration is missing or damaged. */
+export function audioConfig(codec: string, extra: Uint8Array): AudioDecoderConfig | null {
   switch (codec) {
     case "PCMU":
       return { codec: "ulaw", sampleRate: 8000, numberOfChannels: 1 };
     case "PCMA":
       return { codec: "alaw", sampleRate: 8000, numberOfChannels: 1 };
     case "OPUS":
-      // In the configuration that Ogg files begin with, the number of channels is the tenth byte.
+      // The configuration is an Ogg identification header; its tenth byte is the number of channels.
       return { codec: "opus", sampleRate: 48000, numberOfChannels: extra.length >= 19 ? extra[9]! : 2 };
     case "AAC":
       return aacConfig(extra);
@@ -54,16 +54,16 @@ export function soundConfig(codec: string, extra: Uint8Array): AudioDecoderConfi
 }
 
 const kAacRates = [96000, 88200, 64000, 48000, 44100, 32000, 24000, 22050, 16000, 12000, 11025, 8000, 7350];
-const kRateInFull = 15;
+const kExplicitRate = 15;
 
-/** Five bits of object type, four of rate (or 24 more with the rate itself), four of channels. */
+/** AudioSpecificConfig: five bits of object type, four of rate (or 24 more with the rate itself), four of channels. */
 function aacConfig(description: Uint8Array): AudioDecoderConfig | null {
   const bits = [...description.subarray(0, 8)].map((byte) => byte.toString(2).padStart(8, "0")).join("");
   const read = (from: number, count: number) => parseInt(bits.slice(from, from + count), 2);
   const rateIndex = read(5, 4);
-  const inFull = rateIndex === kRateInFull;
-  const sampleRate = inFull ? read(9, 24) : kAacRates[rateIndex];
-  const channels = read(inFull ? 33 : 9, 4);
+  const isExplicit = rateIndex === kExplicitRate;
+  const sampleRate = isExplicit ? read(9, 24) : kAacRates[rateIndex];
+  const channels = read(isExplicit ? 33 : 9, 4);
   if (!sampleRate || !(channels >= 1 && channels <= 7)) return null;
   return { codec: `mp4a.40.${read(0, 5)}`, sampleRate, numberOfChannels: channels === 7 ? 8 : channels, description };
 }

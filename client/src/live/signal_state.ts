@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Judges whether what a tile shows is live.
+// Decides whether what a tile shows is live.
 //
-// Why so        A frozen picture that looks alive is the worst thing a tile can show. So nothing but a new picture, told
-//               by its capture time and its age, keeps a tile live: not an open connection, nor a part that repeats the
-//               last picture, nor an old picture just delivered.
+// Why so        A frozen picture that looks live is the worst thing a tile can show. So only a new picture, recognised by its
+//               capture time and its age, keeps a tile live: not an open connection, nor a part that repeats the last
+//               picture, nor an old picture delivered late.
 // Invariants    (1) `live` means: the newest picture was captured less than the limit ago.
-//               (2) `lost` is left by a new picture or by `end` alone, never by an attempt to reconnect.
+//               (2) Only a new picture or `end` leaves `lost`, never an attempt to reconnect.
 
 export type SignalState =
   | { kind: "idle" }
@@ -24,7 +24,7 @@ export interface Clock {
 
 export const kBrowserClock: Clock = { steadyMs: () => performance.now(), wallMs: () => Date.now() };
 
-export class SignalJudge {
+export class SignalMonitor {
   readonly #clock: Clock;
   #watching = false;
   #connected = false;
@@ -39,7 +39,7 @@ export class SignalJudge {
     this.#clock = clock;
   }
 
-  /** Watching begins, or goes on with another limit when it had begun. */
+  /** Starts watching, or continues with another limit. */
   begin(lostAfterMs: number): void {
     this.#lostAfterMs = lostAfterMs;
     if (this.#watching) return;
@@ -51,7 +51,7 @@ export class SignalJudge {
     this.#sinceMs = this.#clock.wallMs();
   }
 
-  /** A picture came; one with the capture time of the last is the same picture sent again. */
+  /** A picture has come; one with the capture time of the last is the same picture sent again. */
   picture(capturedMs: number, ageMs: number): void {
     if (capturedMs === this.#capturedMs) return;
     this.#capturedMs = this.#sinceMs = capturedMs;
@@ -61,7 +61,7 @@ export class SignalJudge {
   }
 
   /** The connection ended or failed; `reason` is for the user. */
-  broke(reason: string): void {
+  disconnected(reason: string): void {
     this.#connected = false;
     this.#reason = reason;
   }

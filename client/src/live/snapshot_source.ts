@@ -1,33 +1,34 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Live pictures of a camera by asking for a snapshot again and again: for tiles that get no stream of their own.
+// Live pictures of a camera by polling for snapshots: for tiles without a stream of their own.
 
+import { delay } from "../wire/delay";
+import type { Semaphore } from "../wire/semaphore";
 import type { Camera, Server } from "../wire/server";
-import { pause, type Frame, type LiveSource } from "./source";
-import type { Turns } from "./turns";
+import type { Frame, LiveSource } from "./source";
 
-/** A camera that answers does so at once; one that does not must not keep the others waiting for long. */
-const kAnswerLimitMs = 3_000;
+/** Short, since a camera that does not answer must not hold up the others. */
+const kAnswerTimeoutMs = 3_000;
 
 export class SnapshotSource implements LiveSource {
   readonly lostAfterMs = 10_000;
-  readonly everyMs = 2_000;
+  readonly pollIntervalMs = 2_000;
   readonly #server: Server;
   readonly #camera: Camera;
-  readonly #turns: Turns;
+  readonly #semaphore: Semaphore;
 
   /** `turns` is shared by all that poll the same server. */
-  constructor(server: Server, camera: Camera, turns: Turns) {
+  constructor(server: Server, camera: Camera, semaphore: Semaphore) {
     this.#server = server;
     this.#camera = camera;
-    this.#turns = turns;
+    this.#semaphore = semaphore;
   }
 
   async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
     while (!signal.aborted) {
       try {
-        const snapshot = await this.#turns.run(signal, () =>
-          this.#server.snapshot(this.#camera, signal, kAnswerLimitMs),
+        const snapshot = await this.#semaphore.run(signal, () =>
+          this.#server.snapshot(this.#camera, signal, kAnswerTimeoutMs),
         );
         const image = await createImageBitmap(snapshot.jpeg);
         if (signal.aborted) return image.close();
@@ -36,7 +37,7 @@ export class SnapshotSource implements LiveSource {
         if (signal.aborted) return;
         throw error;
       }
-      await pause(this.everyMs, signal);
+      await delay(this.pollIntervalMs, signal);
     }
   }
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Where the pictures of a tile come from. Each way of getting them is one LiveSource; a tile knows no more than this.
+// Where live pictures come from; each way of getting them is one implementation.
 
 export interface Frame {
   /** Whoever receives the frame draws it and closes it. */
@@ -12,27 +12,13 @@ export interface Frame {
 }
 
 export interface LiveSource {
-  /** Without a new picture for so long the signal counts as lost. */
+  /** Without a new picture for this long the signal counts as lost. */
   readonly lostAfterMs: number;
-  /** A picture every so many milliseconds for a source that polls; 0 for a stream. */
-  readonly everyMs: number;
+  /** Of a source that polls for pictures; 0 for a stream. */
+  readonly pollIntervalMs: number;
   /**
    * Shows pictures until `signal` is aborted or the connection ends (both resolve) or fails (rejects with a ServerError).
    * May be called again after that.
    */
   run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void>;
-}
-
-/** Resolves after the time, or at once when `signal` is aborted. */
-export function pause(milliseconds: number, signal: AbortSignal): Promise<void> {
-  return new Promise((resolve) => {
-    if (signal.aborted) return resolve();
-    const done = () => {
-      clearTimeout(timer);
-      signal.removeEventListener("abort", done);
-      resolve();
-    };
-    const timer = setTimeout(done, milliseconds);
-    signal.addEventListener("abort", done);
-  });
 }

@@ -1,19 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Plays what a jitter buffer holds; runs in the audio thread, apart from everything else of the client.
+// Plays what a jitter buffer holds; runs in the audio thread, separate from the rest of the client.
 
-import { JitterBuffer, type SoundPiece } from "./jitter_buffer";
+import { JitterBuffer, type AudioChunk } from "./jitter_buffer";
 
-/** To the worklet: sound, or how much later to play it. */
-export type SpeakerOrder = SoundPiece | { waitMs: number };
+/** To the worklet: audio to play, or by how much more to delay it. */
+export type SpeakerCommand = AudioChunk | { postponeMs: number };
 
-/** From the worklet: the stream time that leaves it at a time of its context; null while nothing does. */
+/** From the worklet: the stream time that it plays at a time of its context; null while it plays nothing. */
 export interface SpeakerReport {
   playedUs: number | null;
   contextTime: number;
 }
 
-// The audio thread has names of its own, of which TypeScript's library knows nothing.
+// Globals of the audio thread, which TypeScript's library does not declare.
 declare const sampleRate: number;
 declare const currentTime: number;
 declare class AudioWorkletProcessor {
@@ -29,8 +29,8 @@ class Speaker extends AudioWorkletProcessor {
 
   constructor() {
     super();
-    this.port.onmessage = ({ data }: MessageEvent<SpeakerOrder>) => {
-      if ("waitMs" in data) this.#buffer.wait(data.waitMs);
+    this.port.onmessage = ({ data }: MessageEvent<SpeakerCommand>) => {
+      if ("postponeMs" in data) this.#buffer.postpone(data.postponeMs);
       else this.#buffer.push(data);
     };
   }

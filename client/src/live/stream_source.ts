@@ -4,30 +4,30 @@
 //
 // Why so        An image element would show JPEG streams with less code, but tells neither when a picture was captured nor
 //               that the stream has ended. Here each part is known, and a JPEG picture that comes while another is being
-//               decoded takes the place of any that waits: a slow viewer sees fewer pictures, never older ones.
+//               decoded replaces any that waits: a slow viewer sees fewer pictures, never older ones.
 //
 //               A stream that cannot be played here is closed, and still pictures are asked for in its place for a while.
 
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
 import { kVideoTypeMjpeg, ServerError, type Camera, type Server } from "../wire/server";
+import type { AudioPlayer } from "./audio_player";
 import { captureOf, mediaOf } from "./media_part";
-import { missingDecoder, type Obstacle } from "./obstacle";
-import type { Sound } from "./sound";
 import type { Frame, LiveSource } from "./source";
+import { missingDecoder, type Unplayable } from "./unplayable";
 import { VideoPlayer } from "./video_player";
 
-/** The small picture of cameras that have one. */
+/** The profile of small pictures, of cameras that have one. */
 const kSmallProfile = 1;
-/** Longer than the server takes to find out that a camera is silent. */
-const kSilenceLimitMs = 25_000;
-/** No answer, no session, too busy: failures that another profile would meet as well. */
-const kNotTheProfile = [0, 401, 503];
-/** A timer's longest. */
-const kForeverMs = 2 ** 31 - 1;
+/** Longer than the server takes to notice that a camera sends nothing. */
+const kMaxSilenceMs = 25_000;
+/** No answer, no session, too busy: failures that do not depend on the profile. */
+const kProfileIndependent = [0, 401, 503];
+/** The longest that a timer can wait. */
+const kMaxTimerMs = 2 ** 31 - 1;
 
 /** Decodes one picture at a time, and of those that come meanwhile the newest only. */
-export class NewestPicture {
+export class NewestFrame {
   #waiting: Part | null = null;
   #busy = false;
   readonly #show: (part: Part) => Promise<void>;
@@ -58,39 +58,39 @@ export class StreamSource implements LiveSource {
   readonly #camera: Camera;
   readonly #small: boolean;
   readonly #stills: LiveSource;
-  readonly #sound: Sound | null;
+  readonly #audio: AudioPlayer | null;
   #smallWorks = true;
-  #obstacle: Obstacle | null;
-  #obstacleEndsMs = 0;
+  #unplayable: Unplayable | null;
+  #retryAtMs = 0;
 
   /** `small` asks for the small picture, if the camera has one; `stills` stands in for a stream that cannot be played. */
-  constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, sound: Sound | null = null) {
+  constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, audio: AudioPlayer | null = null) {
     this.#server = server;
     this.#camera = camera;
     this.#small = small;
     this.#stills = stills;
-    this.#sound = sound;
-    this.#obstacle = null;
+    this.#audio = audio;
+    this.#unplayable = null;
     const missing = camera.video_type === kVideoTypeMjpeg ? null : missingDecoder();
-    if (missing) this.#meet(missing);
+    if (missing) this.#markUnplayable(missing);
   }
 
   /** Why still pictures are shown, or null while the stream is worth a try. */
-  get obstacle(): Obstacle | null {
-    return performance.now() < this.#obstacleEndsMs ? this.#obstacle : null;
+  get unplayable(): Unplayable | null {
+    return performance.now() < this.#retryAtMs ? this.#unplayable : null;
   }
 
   get lostAfterMs(): number {
-    return this.obstacle ? this.#stills.lostAfterMs : 5_000;
+    return this.unplayable ? this.#stills.lostAfterMs : 5_000;
   }
 
-  get everyMs(): number {
-    return this.obstacle ? this.#stills.everyMs : 0;
+  get pollIntervalMs(): number {
+    return this.unplayable ? this.#stills.pollIntervalMs : 0;
   }
 
   async run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
-    if (!this.obstacle) return this.#play(show, signal);
-    const untilRetry = new Deadline(Math.min(this.#obstacleEndsMs - performance.now(), kForeverMs), signal);
+    if (!this.unplayable) return this.#play(show, signal);
+    const untilRetry = new Deadline(Math.min(this.#retryAtMs - performance.now(), kMaxTimerMs), signal);
     try {
       await this.#stills.run(show, untilRetry.signal);
     } finally {
@@ -98,9 +98,9 @@ export class StreamSource implements LiveSource {
     }
   }
 
-  #meet(obstacle: Obstacle): void {
-    this.#obstacle = obstacle;
-    this.#obstacleEndsMs = performance.now() + obstacle.retryMs;
+  #markUnplayable(unplayable: Unplayable): void {
+    this.#unplayable = unplayable;
+    this.#retryAtMs = performance.now() + unplayable.retryMs;
   }
 
   async #play(show: (frame: Frame) => void, signal: AbortSignal): Promise<void> {
@@ -109,7 +109,7 @@ export class StreamSource implements LiveSource {
     const count = () => (pictures += 1);
     if (trySmall) {
       const failure = await this.#stream(kSmallProfile, show, count, signal).catch((error: ServerError) => error);
-      const hopeless = failure instanceof ServerError && kNotTheProfile.includes(failure.status);
+      const hopeless = failure instanceof ServerError && kProfileIndependent.includes(failure.status);
       if (pictures > 0 || signal.aborted || hopeless) {
         if (failure instanceof ServerError) throw failure;
         return;
@@ -118,24 +118,24 @@ export class StreamSource implements LiveSource {
     try {
       await this.#stream(null, show, count, signal);
     } finally {
-      // The usual picture came where the small one did not: ask for it first from now on.
+      // The default profile works where the small one does not: ask for it first from now on.
       if (trySmall && pictures > 0) this.#smallWorks = false;
     }
   }
 
   async #stream(profile: number | null, show: (frame: Frame) => void, count: () => void, owner: AbortSignal) {
-    const deadline = new Deadline(kSilenceLimitMs, owner);
-    const pictures = new NewestPicture(async (part) => {
+    const deadline = new Deadline(kMaxSilenceMs, owner);
+    const pictures = new NewestFrame(async (part) => {
       const capture = captureOf(part.headers, Date.now());
       const image = await createImageBitmap(new Blob([part.body], { type: "image/jpeg" }));
       if (deadline.signal.aborted) return image.close();
       show({ image, ...capture });
     });
-    const giveUp = (obstacle: Obstacle) => {
-      this.#meet(obstacle);
+    const giveUp = (unplayable: Unplayable) => {
+      this.#markUnplayable(unplayable);
       deadline.release();
     };
-    const video = new VideoPlayer(show, giveUp, this.#sound);
+    const video = new VideoPlayer(show, giveUp, this.#audio);
     try {
       const answer = await this.#server.live(this.#camera, profile, deadline.signal);
       const boundary = boundaryOf(answer.headers.get("Content-Type"));
@@ -150,7 +150,7 @@ export class StreamSource implements LiveSource {
       const reader = answer.body.getReader();
       for (let read = await reader.read(); !read.done; read = await reader.read()) parser.push(read.value);
     } catch (error) {
-      if (owner.aborted || this.obstacle) return;
+      if (owner.aborted || this.unplayable) return;
       throw streamError(error);
     } finally {
       video.close();
@@ -158,10 +158,10 @@ export class StreamSource implements LiveSource {
     }
   }
 
-  #deliver(part: Part, pictures: NewestPicture, video: VideoPlayer): void {
+  #deliver(part: Part, pictures: NewestFrame, video: VideoPlayer): void {
     const media = mediaOf(part);
     if (media?.kind === "jpeg") pictures.offer(part);
-    else if (media?.kind === "sound") this.#sound?.take(media, part.body);
+    else if (media?.kind === "audio") this.#audio?.take(media, part.body);
     else if (media) video.take(media.codec, media.timestampUs, part.body, captureOf(part.headers, Date.now()));
   }
 }

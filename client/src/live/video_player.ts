@@ -1,22 +1,22 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Decodes a compressed stream and shows its pictures: at once, or in step with the sound while that is heard.
+// Decodes compressed video and shows its frames: at once, or in sync with the audio while that is audible.
 
-import { factsOf, type VideoCodec } from "./annexb";
-import { PictureQueue } from "./av_clock";
+import { frameInfoOf, type VideoCodec } from "./annexb";
+import type { AudioPlayer } from "./audio_player";
+import { FrameQueue } from "./av_clock";
 import { FrameGate } from "./frame_gate";
 import type { Capture } from "./media_part";
-import { kUndecodable, unsupported, type Obstacle } from "./obstacle";
-import type { Sound } from "./sound";
 import type { Frame } from "./source";
+import { kUndecodable, unsupported, type Unplayable } from "./unplayable";
 
-/** A damaged piece now and then is no reason to give up a stream. */
-const kMostErrors = 3;
+/** Damage now and then is no reason to give up a stream. */
+const kMaxErrors = 3;
 const kErrorsForgottenMs = 30_000;
-/** Longer than the distance of two key frames. */
-const kFirstPictureLimitMs = 12_000;
-/** A decoder that takes so many pictures without giving one never will. */
-const kMostUnanswered = 500;
+/** Longer than the interval of two key frames. */
+const kMaxFirstPictureMs = 12_000;
+/** A decoder that takes this many frames without returning one never will. */
+const kMaxUnanswered = 500;
 
 interface Arrival extends Capture {
   arrivedMs: number;
@@ -24,33 +24,33 @@ interface Arrival extends Capture {
 
 export class VideoPlayer {
   readonly #show: (frame: Frame) => void;
-  readonly #giveUp: (obstacle: Obstacle) => void;
-  readonly #sound: Sound | null;
+  readonly #giveUp: (unplayable: Unplayable) => void;
+  readonly #audio: AudioPlayer | null;
   readonly #gate = new FrameGate();
-  readonly #queue: PictureQueue<VideoFrame>;
+  readonly #queue: FrameQueue<VideoFrame>;
   readonly #arrivals = new Map<number, Arrival>();
   readonly #startedMs = performance.now();
   #decoder: VideoDecoder | null = null;
   #codecString = "";
   #errors: number[] = [];
   #hasShown = false;
-  #nextTurn = 0;
+  #animationFrame = 0;
   #closed = false;
 
   /** `giveUp` is called when the stream cannot be played; nothing is shown after that. */
-  constructor(show: (frame: Frame) => void, giveUp: (obstacle: Obstacle) => void, sound: Sound | null) {
+  constructor(show: (frame: Frame) => void, giveUp: (unplayable: Unplayable) => void, audio: AudioPlayer | null) {
     this.#show = show;
     this.#giveUp = giveUp;
-    this.#sound = sound;
-    this.#queue = new PictureQueue((us) => sound?.wait(us));
+    this.#audio = audio;
+    this.#queue = new FrameQueue((us) => audio?.postpone(us));
   }
 
   take(codec: VideoCodec, timestamp: number, data: Uint8Array, capture: Capture): void {
     if (this.#closed) return;
     const nowMs = performance.now();
-    const hasWaitedEnough = !this.#hasShown && nowMs - this.#startedMs > kFirstPictureLimitMs;
-    if (hasWaitedEnough || this.#arrivals.size > kMostUnanswered) return this.#end(kUndecodable);
-    const { isKey, codecString } = factsOf(codec, data);
+    const hasWaitedEnough = !this.#hasShown && nowMs - this.#startedMs > kMaxFirstPictureMs;
+    if (hasWaitedEnough || this.#arrivals.size > kMaxUnanswered) return this.#end(kUndecodable);
+    const { isKey, codecString } = frameInfoOf(codec, data);
     if (isKey && codecString && codecString !== this.#codecString) this.#configure(codec, codecString);
     if (!this.#decoder) return;
     const admission = this.#gate.admit(isKey, this.#decoder.decodeQueueSize);
@@ -66,7 +66,7 @@ export class VideoPlayer {
 
   close(): void {
     this.#closed = true;
-    cancelAnimationFrame(this.#nextTurn);
+    cancelAnimationFrame(this.#animationFrame);
     this.#queue.clear();
     this.#dropDecoder();
   }
@@ -75,7 +75,7 @@ export class VideoPlayer {
     this.#dropDecoder();
     this.#codecString = codecString;
     const decoder = new VideoDecoder({
-      output: (picture) => this.#receive(picture),
+      output: (frame) => this.#receive(frame),
       error: () => void (decoder === this.#decoder && this.#recover(codec, codecString)),
     });
     decoder.configure(configOf(codecString));
@@ -95,37 +95,37 @@ export class VideoPlayer {
     const nowMs = performance.now();
     this.#errors = [...this.#errors.filter((atMs) => nowMs - atMs < kErrorsForgottenMs), nowMs];
     this.#dropDecoder();
-    // Browsers do not agree on the error that tells a codec they do not know.
+    // Browsers do not agree on the error for a codec that they do not support.
     const { supported } = await VideoDecoder.isConfigSupported(configOf(codecString));
     if (this.#closed) return;
     if (!supported) this.#end(unsupported(codec));
-    else if (this.#errors.length >= kMostErrors) this.#end(kUndecodable);
+    else if (this.#errors.length >= kMaxErrors) this.#end(kUndecodable);
   }
 
-  #end(obstacle: Obstacle): void {
+  #end(unplayable: Unplayable): void {
     this.close();
-    this.#giveUp(obstacle);
+    this.#giveUp(unplayable);
   }
 
-  #receive(picture: VideoFrame): void {
-    if (this.#closed) return picture.close();
-    this.#queue.push(picture);
+  #receive(frame: VideoFrame): void {
+    if (this.#closed) return frame.close();
+    this.#queue.push(frame);
     this.#present();
   }
 
   #present(): void {
-    cancelAnimationFrame(this.#nextTurn);
+    cancelAnimationFrame(this.#animationFrame);
     const nowMs = performance.now();
-    const image = this.#queue.take(this.#sound?.heardUs(nowMs) ?? null, nowMs);
+    const image = this.#queue.take(this.#audio?.audibleUs(nowMs) ?? null, nowMs);
     if (image) {
       const arrival = this.#arrivalOf(image.timestamp);
       this.#hasShown = true;
       this.#show({ image, capturedMs: arrival.capturedMs, ageMs: arrival.ageMs + nowMs - arrival.arrivedMs });
     }
-    if (!this.#queue.isEmpty) this.#nextTurn = requestAnimationFrame(() => this.#present());
+    if (!this.#queue.isEmpty) this.#animationFrame = requestAnimationFrame(() => this.#present());
   }
 
-  /** Forgets all up to this picture: those that have not been shown by now never will be. */
+  /** Forgets all up to this frame: those that have not been shown by now never will be. */
   #arrivalOf(timestamp: number): Arrival {
     const arrival = this.#arrivals.get(timestamp) ?? { capturedMs: Date.now(), ageMs: 0, arrivedMs: performance.now() };
     for (const earlier of this.#arrivals.keys()) if (earlier <= timestamp) this.#arrivals.delete(earlier);

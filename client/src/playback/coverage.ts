@@ -1,17 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What of a span was recorded, as segments that a timeline draws; and why, as the user tells kinds apart.
+// What of a span was recorded, as segments for a timeline; and the kinds of events that the user tells apart.
 
 import type { Footage, FootageKind, Runs } from "../wire/recordings";
 
 export interface Segment {
   startS: number;
   stopS: number;
-  /** Not only recorded, but kept as an event. */
+  /** Part of an event, not only recorded. */
   isEvent: boolean;
 }
 
-/** Runs of steps from `fromS` on, cut at `toS`, without those of nothing. */
+/** The segments of run lengths that begin at `fromS`, cut at `toS`. */
 export function segmentsOf(fromS: number, toS: number, interval: number, runs: Runs): Segment[] {
   const segments: Segment[] = [];
   let startS = fromS;
@@ -35,7 +35,7 @@ export function kindOf({ kind, reason }: Pick<Footage, "kind" | "reason">): Even
   return reason === kReasonContinuous ? "continuous" : "alarm";
 }
 
-/** The first of the footage, in order of start, that ends after the time. */
+/** Index of the first footage, in order of start, that ends after the time. */
 export function firstEndingAfter(footage: readonly Footage[], timeS: number): number {
   // Starts ascend and spans of one camera hardly overlap, so ends ascend as well.
   let [low, high] = [0, footage.length];

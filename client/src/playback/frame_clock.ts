@@ -1,19 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which frame of a recording belongs to which time, as well as can be known without asking.
+// Converts between frame numbers and times of a recording, as exactly as is possible without asking the server.
 //
-// Why so        A stream names its frames by index, the timeline knows times. A list gives a recording's first and last
-//               second and its number of frames; a camera whose rate varies strays from the line between. Each frame that
-//               was fetched by its time is exact, so the line is bent through it.
+// Why so        A stream numbers its frames, the timeline knows times. A list gives a recording's first and last second and
+//               its number of frames; a camera of varying frame rate deviates from the straight line between. Each frame that
+//               was fetched by its time is exact, so the line is bent to pass through it.
 
 interface Anchor {
   index: number;
   ms: number;
 }
 
-const kMostAnchors = 64;
-/** Where nothing is known of the number of frames. */
-const kGuessedPerSecond = 10;
+const kMaxAnchors = 64;
+/** Where the number of frames is unknown. */
+const kAssumedFramesPerSecond = 10;
 
 export class FrameClock {
   #end: Anchor;
@@ -29,11 +29,11 @@ export class FrameClock {
     this.#end = endOf(frameCount, durationMs);
   }
 
-  /** This frame is of this time. */
+  /** The frame is known to be of this time. */
   learn(index: number, ms: number): void {
     const before = this.#anchors.filter((anchor) => anchor.index < index && anchor.ms < ms);
     const after = this.#anchors.filter((anchor) => anchor.index > index && anchor.ms > ms);
-    this.#anchors = [...before, { index, ms }, ...after].slice(-kMostAnchors);
+    this.#anchors = [...before, { index, ms }, ...after].slice(-kMaxAnchors);
   }
 
   msOf(index: number): number {
@@ -45,7 +45,7 @@ export class FrameClock {
   indexOf(ms: number): number {
     const [from, to] = this.#around((anchor) => anchor.ms <= ms);
     const index = from.index + ((ms - from.ms) * (to.index - from.index)) / (to.ms - from.ms);
-    // A time that came from an index leads back to it, whatever the division left behind the point.
+    // A time that came from an index leads back to it, whatever rounding did.
     return Math.max(0, Math.floor(index + 1e-6));
   }
 
@@ -61,5 +61,5 @@ export class FrameClock {
 
 function endOf(frameCount: number, durationMs: number): Anchor {
   const ms = Math.max(durationMs, 1000);
-  return { index: frameCount > 0 ? frameCount : (ms / 1000) * kGuessedPerSecond, ms };
+  return { index: frameCount > 0 ? frameCount : (ms / 1000) * kAssumedFramesPerSecond, ms };
 }

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads a recording's frames out of the stream that plays it: a part with the index, then one with the picture.
+// Reads the frames of a recording's stream: of each a part with its number, then one with the picture.
 //
 // Why so        The next frames are read only when the last was taken. So a slow screen holds the server back through the
-//               connection, and the frame that is shown is the one that is named.
+//               connection, and the number that is shown is that of the frame on the screen.
 
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
@@ -14,8 +14,8 @@ export interface RecordedFrame {
   jpeg: Blob;
 }
 
-/** More than the longest pause the server makes between two frames of the slowest motion. */
-const kSilenceLimitMs = 25_000;
+/** More than the longest time between two frames of slow motion. */
+const kMaxSilenceMs = 25_000;
 
 /**
  * Opens a stream and hands its frames to `take` until that returns false, the stream ends (both resolve) or fails
@@ -26,7 +26,7 @@ export async function readFrames(
   take: (frame: RecordedFrame) => Promise<boolean>,
   owner: AbortSignal,
 ): Promise<void> {
-  const deadline = new Deadline(kSilenceLimitMs, owner);
+  const deadline = new Deadline(kMaxSilenceMs, owner);
   try {
     const answer = await open(deadline.signal);
     const boundary = boundaryOf(answer.headers.get("Content-Type"));

@@ -3,13 +3,13 @@
 // Plays one recording after another in one place on the screen: play, pause, step, seek, rate.
 //
 // Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream, and
-//               everything that moves opens another. While the picture stands still there is no connection at all. A held
-//               key or a dragged playhead asks for more frames than can be fetched: of those only the last is.
+//               every seek opens another. While paused there is no connection at all. A held
+//               key or a dragged playhead asks for more frames than can be fetched: then only the last is.
 //
 //               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
-//               recording that still grows goes on as it grows, and ends with it.
+//               growing recording continues as it grows, and ends with it.
 
-import { pause as wait } from "../live/source";
+import { delay } from "../wire/delay";
 import { newStreamKey, type Footage, type Recordings, type Start } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { FrameClock } from "./frame_clock";
@@ -20,16 +20,16 @@ export type PlayerState =
   | { kind: "empty" }
   | { kind: "opening" | "playing" | "paused" | "ended" }
   /** The server ended the stream before its end: another player of this session has taken over. */
-  | { kind: "pushedOut" }
+  | { kind: "preempted" }
   | { kind: "failed"; reason: string };
 
-/** Slow motion by that factor below 0; above, that many frames at a time. */
+/** Below 0 slow motion by that factor; n above 1 shows every n-th frame. */
 export const kRates = [-8, -4, -2, 1, 2, 4, 8, 16] as const;
 
-const kTailPauseMs = 1_000;
+const kTailDelayMs = 1_000;
 /** The server waits longer for what is still being recorded, and not at all when another player takes over. */
 const kTailSilenceMs = 1_500;
-/** The last second of a list is not exact. */
+/** A list rounds a recording's end to seconds. */
 const kExactUntilMs = 1_000;
 const kCannotPlay = 200;
 
@@ -46,7 +46,7 @@ export class Player {
   #key = 0;
   #lastFrameMs = 0;
   #run = new AbortController();
-  /** The frame asked for last while the picture stands still, until it is shown; and what fetches it. */
+  /** While paused: the frame requested last, until it is shown; and the request that is under way. */
   #wanted: Start | null = null;
   #fetching: AbortSignal | null = null;
 
@@ -78,7 +78,7 @@ export class Player {
     return (this.#footage?.start ?? 0) * 1000 + this.#clock.msOf(this.#index);
   }
 
-  /** Goes over to a recording, `sinceStartMs` after its beginning. */
+  /** Changes to a recording, `sinceStartMs` after its start. */
   open(footage: Footage, sinceStartMs: number, isPlaying: boolean): void {
     const isSame = this.#footage?.kind === footage.kind && this.#footage.id === footage.id;
     if (!isSame) this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
@@ -95,7 +95,7 @@ export class Player {
 
   pause(): void {
     if (this.#state.kind !== "playing" && this.#state.kind !== "opening") return;
-    // Before the first frame there is nothing that could stand still yet.
+    // Before the first frame there is no picture yet that could stay.
     if (this.#state.kind === "opening") return this.#showStill({ index: this.#index });
     this.#begin();
     this.#become({ kind: "paused" });
@@ -109,7 +109,7 @@ export class Player {
     if (index !== this.#index || this.#state.kind !== "paused") this.#showStill({ index });
   }
 
-  /** Follows a running stream; the picture shows no break where the server can do that. */
+  /** Changes a running stream, without interruption where the server can do that. */
   setRate(rate: number): void {
     if (rate === this.#rate) return;
     this.#rate = rate;
@@ -121,7 +121,7 @@ export class Player {
     });
   }
 
-  /** Ends the connection; nothing is shown any more. */
+  /** Closes the connection, and goes back to having nothing to play. */
   close(): void {
     this.#begin();
     this.#footage = null;
@@ -206,7 +206,7 @@ export class Player {
       const failure = await this.#stream(index, signal).catch((error: ServerError) => error);
       if (signal.aborted) return;
       if (failure) return this.#fail(failure, signal);
-      if (this.#state.kind === "ended" || !(await this.#goesOn(signal))) return;
+      if (this.#state.kind === "ended" || !(await this.#continues(signal))) return;
     }
   }
 
@@ -245,10 +245,10 @@ export class Player {
   }
 
   /**
-   * After the server has ended a stream: whether there is more to play. Else the state says why not. A player that was
-   * replaced is unknown to the server from then on, so that it is told by how the stream ended.
+   * Whether there is more to play after the server has ended the stream; else the state says why not. The server cannot be
+   * asked whether this player was preempted, so that is concluded from how the stream ended.
    */
-  async #goesOn(signal: AbortSignal): Promise<boolean> {
+  async #continues(signal: AbortSignal): Promise<boolean> {
     const before = this.#footage!;
     const wasAtTail = before.isGrowing && performance.now() - this.#lastFrameMs >= kTailSilenceMs;
     const footage = await this.#recordings.find(before).catch(() => before);
@@ -260,22 +260,22 @@ export class Player {
     this.#take(footage);
     const isAtEnd = !footage.isGrowing && this.#index + Math.max(1, this.#rate) >= footage.frameCount;
     if (!wasAtTail || isAtEnd) {
-      this.#become({ kind: wasAtTail ? "ended" : "pushedOut" });
+      this.#become({ kind: wasAtTail ? "ended" : "preempted" });
       return false;
     }
-    // At the end of what there is, no rate is faster than the camera.
+    // At the end of what is recorded so far, playback cannot be faster than the camera.
     if (footage.isGrowing && this.#rate > 1) this.#rate = 1;
-    if (footage.isGrowing) await wait(kTailPauseMs, signal);
+    if (footage.isGrowing) await delay(kTailDelayMs, signal);
     return !signal.aborted;
   }
 
-  /** A recording that retention took away is told from one that cannot be played. */
+  /** Tells a recording that retention has deleted from one that cannot be played. */
   async #fail(error: ServerError, signal: AbortSignal): Promise<void> {
     let reason = error.message;
     if (error.status === kCannotPlay || error.status === 404) {
       const footage = await this.#recordings.find(this.#footage!).catch(() => this.#footage);
       if (signal.aborted) return;
-      if (!footage) reason = "The recording is gone.";
+      if (!footage) reason = "The recording no longer exists.";
       else if (error.status === 404) reason = "The recording cannot be played.";
     }
     this.#begin();

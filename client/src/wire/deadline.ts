@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Lets a request end when its owner no longer wants it, or when nothing has come from it for too long.
+// Aborts a request when its owner does, or when nothing has come from the server for too long.
 
 export class Deadline {
   readonly #abort = new AbortController();
@@ -8,9 +8,9 @@ export class Deadline {
   readonly #onOwnerAbort = () => this.#abort.abort();
   #timer: ReturnType<typeof setTimeout> | undefined;
 
-  /** Runs from now on; call `extend` at each sign of life and `release` at the end. */
+  /** Runs from now on; call `extend` when data comes, and `release` at the end. */
   constructor(
-    readonly limitMs: number,
+    readonly timeoutMs: number,
     owner?: AbortSignal,
   ) {
     this.#owner = owner;
@@ -26,7 +26,7 @@ export class Deadline {
 
   extend(): void {
     clearTimeout(this.#timer);
-    this.#timer = setTimeout(() => this.#abort.abort(), this.limitMs);
+    this.#timer = setTimeout(() => this.#abort.abort(), this.timeoutMs);
   }
 
   /** Closes the request as well, if it is still open. */

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps as the web API tells them: pictures with items for everyone, raw lists of items for their editor.
+// E-maps of the web API: the picture with its items for viewers, the plain list of items for the editor.
 
 import type { Camera, Server } from "./server";
 
@@ -18,7 +18,7 @@ export interface MapItem {
   x: number;
   y: number;
   direction: number;
-  /** Where the name stands: 0 below, 1 above, 2 left, 3 right. */
+  /** Where the name is shown: 0 below, 1 above, 2 left, 3 right. */
   textPos: number;
   iconCenterX: number;
   iconCenterY: number;
@@ -27,7 +27,7 @@ export interface MapItem {
 }
 
 /** An item as a viewer gets it. */
-export interface SeenItem extends MapItem {
+export interface ViewerItem extends MapItem {
   /** Of a camera, and of one that watches the device; null where there is none. */
   camera: Pick<Camera, "id" | "server"> | null;
   videoType: number;
@@ -40,10 +40,10 @@ export interface MapFlags {
   smallItems: boolean;
 }
 
-export interface SeenMap extends MapFlags {
+export interface ViewerMap extends MapFlags {
   /** Null where the server has none that can be read. */
   picture: Blob | null;
-  items: SeenItem[];
+  items: ViewerItem[];
 }
 
 export interface EditedMap extends MapFlags {
@@ -71,7 +71,7 @@ export interface DeviceState {
   camera: number;
 }
 
-/** Something that may be placed. */
+/** A device or port that can be placed on a map. */
 export interface Placeable {
   kind: ItemKind;
   id: number;
@@ -94,7 +94,7 @@ interface RawItem {
   portIdx?: number;
 }
 
-interface RawSeenItem extends RawItem {
+interface RawViewerItem extends RawItem {
   VideoType?: number;
   portType?: number;
   pairedCamId?: number;
@@ -134,15 +134,15 @@ export class Emaps {
     return (await this.#server.call<{ emap: MapName[] }>("VEXO.Catalog", "Emaps", {})).emap;
   }
 
-  async open(id: number): Promise<SeenMap> {
-    type Raw = { emap: string; emapType: string; hideItemName: boolean; smallItemSize: boolean; items: RawSeenItem[] };
+  async open(id: number): Promise<ViewerMap> {
+    type Raw = { emap: string; emapType: string; hideItemName: boolean; smallItemSize: boolean; items: RawViewerItem[] };
     const api = "VEXO.Lookhaven.Player.LiveviewSrc";
     const raw = await this.#server.call<Raw>(api, "Play", { itemType: "1", camera: String(id) });
     return {
       picture: raw.emap ? pictureOf(raw.emap, kMediaTypes[raw.emapType] ?? "image/png") : null,
       hideNames: raw.hideItemName,
       smallItems: raw.smallItemSize,
-      items: raw.items.map(seenItemOf),
+      items: raw.items.map(viewerItemOf),
     };
   }
 
@@ -212,7 +212,7 @@ function pictureOf(base64: string, type: string): Blob {
   return new Blob([bytes], { type });
 }
 
-/** The viewer's answer has numbers as texts, the editor's has them as they are. */
+/** The viewer's answer has numbers as strings, the editor's as numbers. */
 function itemOf(raw: RawItem): MapItem {
   return {
     kind: kKinds[Number(raw.type)] ?? "camera",
@@ -229,12 +229,12 @@ function itemOf(raw: RawItem): MapItem {
   };
 }
 
-function seenItemOf(raw: RawSeenItem): SeenItem {
+function viewerItemOf(raw: RawViewerItem): ViewerItem {
   const item = itemOf(raw);
   return { ...item, camera: cameraOf(item, raw), videoType: raw.VideoType ?? 0, portType: raw.portType ?? 0 };
 }
 
-function cameraOf(item: MapItem, raw: RawSeenItem): SeenItem["camera"] {
+function cameraOf(item: MapItem, raw: RawViewerItem): ViewerItem["camera"] {
   if (item.kind === "camera") return { id: item.id, server: item.server };
   const id = raw.pairedCamIdOnRec ?? 0;
   return id === 0 ? null : { id, server: raw.pairedCamHxId ?? 0 };

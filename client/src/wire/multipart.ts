@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Cuts an endless multipart body into its parts while it arrives, whatever the pieces it arrives in.
+// Splits an endless multipart body into its parts as it arrives, in whatever chunks.
 //
 // Why so        A picture may contain the boundary by chance, and searching every picture for it costs time. So a body is
 //               taken by its Content-Length, straight into an array of that size; only the few lines between two bodies
@@ -17,8 +17,8 @@ export interface Part {
 /** The body breaks the multipart format or a limit; the stream cannot be continued. */
 export class MultipartError extends Error {}
 
-const kHeadLimitBytes = 8 * 1024;
-const kBodyLimitBytes = 16 * 1024 * 1024;
+const kMaxHeadBytes = 8 * 1024;
+const kMaxBodyBytes = 16 * 1024 * 1024;
 const kLineFeed = 10;
 
 /** The boundary named in a Content-Type header; null when this is no multipart answer. */
@@ -46,7 +46,7 @@ export class MultipartParser {
     this.#deliver = deliver;
   }
 
-  /** Takes the next bytes of the body. Throws MultipartError; the parser is of no use after that. */
+  /** Takes the next bytes of the body. Throws MultipartError; do not use the parser after that. */
   push(chunk: Uint8Array): void {
     let at = 0;
     while (at < chunk.length && !this.#ended) {
@@ -66,7 +66,7 @@ export class MultipartParser {
     const lineFeed = chunk.indexOf(kLineFeed, at);
     const end = lineFeed < 0 ? chunk.length : lineFeed;
     this.#headBytes += end - at + 1;
-    if (this.#headBytes > kHeadLimitBytes) throw new MultipartError("no part within the allowed length");
+    if (this.#headBytes > kMaxHeadBytes) throw new MultipartError("no part within the allowed length");
     this.#line += this.#text.decode(chunk.subarray(at, end));
     if (lineFeed < 0) return end;
     const line = this.#line.endsWith("\r") ? this.#line.slice(0, -1) : this.#line;
@@ -91,7 +91,7 @@ export class MultipartParser {
 
   #startBody(length: string | undefined): void {
     if (length === undefined || !/^\d+$/.test(length)) throw new MultipartError("part without a length");
-    if (Number(length) > kBodyLimitBytes) throw new MultipartError("part too large");
+    if (Number(length) > kMaxBodyBytes) throw new MultipartError("part too large");
     this.#body = new Uint8Array(Number(length));
     this.#bodyBytes = 0;
     if (this.#body.length === 0) this.#finishPart(this.#body);

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What was recorded, as the web API tells it: events, coverage, days, marks; and the streams that play them.
+// Recordings of the web API: events, coverage, days, marks; and the streams that play them.
 
 import { boundaryOf } from "./multipart";
 import { address, asServerError, ServerError, type Server } from "./server";
 
-/** Event: a recording on the disk. Alert and pos: a mark that somebody reported, with the recordings of its span. */
+/** Event: a recording on disk. Alert and pos: a mark reported by analytics or a POS terminal, with the recordings of its span. */
 export type FootageKind = "event" | "alert" | "pos";
 
 export interface FootageRef {
@@ -13,27 +13,31 @@ export interface FootageRef {
   id: number;
 }
 
+export function isSameFootage(one: FootageRef, other: FootageRef | null | undefined): boolean {
+  return one.kind === other?.kind && one.id === other.id;
+}
+
 /** Something that can be played. */
 export interface Footage extends FootageRef {
   camera: number;
   /** Unix seconds. */
   start: number;
-  /** Of what still grows, as far as it can be played now. */
+  /** Of a growing recording, how far it can be played now. */
   stop: number;
-  /** When what a mark tells of happened; its footage begins before. */
+  /** When a mark's event happened; its footage begins before. */
   moment: number;
   /** 0 where the server does not say. */
   frameCount: number;
   isGrowing: boolean;
   /** The server's number for why it was recorded; 0 for marks. */
   reason: number;
-  /** What a mark says, else empty. */
+  /** Of a mark, else empty. */
   text: string;
   /** There is something to play. */
   isSaved: boolean;
 }
 
-/** Value and number of steps: 0 nothing, 1 recorded, 2 an event. */
+/** Run lengths of steps, by value: 0 nothing, 1 recorded, 2 an event. */
 export type Runs = [value: number, count: number][];
 
 export interface CameraHistory {
@@ -52,7 +56,7 @@ export interface Group {
 /** Where a stream begins: at a frame, or (recorded events only) at the frame of a time since the recording's start. */
 export type Start = { index: number } | { timeMs: number };
 
-/** How far a stream goes: that one picture, all there is, or on and on with what is still being recorded. */
+/** How far a stream goes: one frame, all there is, or on with what is still being recorded. */
 export type Extent = "one" | "all" | "growing";
 
 interface RawEvent {
@@ -87,15 +91,15 @@ interface RawHistory {
 const kPlayer = "VEXO.Lookhaven.Player";
 /** The numbers of the kinds on the wire. */
 const kKinds: Record<FootageKind, number> = { event: 0, alert: 1, pos: 2 };
-/** Beyond every frame of every recording, yet far from where the server's 32 bits end. */
+/** Beyond the last frame of any recording, yet far below the limit of the server's 32 bits. */
 const kFarFrame = 1_000_000_000;
-/** The most the server lists at once. */
-const kMostMarks = 10_000;
-const kLargestKey = 2 ** 31 - 1;
+/** As many as the server lists at once. */
+const kMaxMarks = 10_000;
+const kMaxKey = 2 ** 31 - 1;
 
 /** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
 export function newStreamKey(): number {
-  return 1 + (crypto.getRandomValues(new Uint32Array(1))[0]! % (kLargestKey - 1));
+  return 1 + (crypto.getRandomValues(new Uint32Array(1))[0]! % (kMaxKey - 1));
 }
 
 export class Recordings {
@@ -135,7 +139,7 @@ export class Recordings {
     const answer = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", {
       from: String(fromS),
       to: String(toS),
-      limit: String(kMostMarks),
+      limit: String(kMaxMarks),
       cameralists: cameras.join(),
     });
     return answer.event.map(markOf);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The web API as the client uses it: typed answers, and for each failure one sentence that a person understands.
+// The web API as the client uses it: typed answers, and for each failure one sentence for the user.
 
 import { Deadline } from "./deadline";
 
@@ -43,7 +43,7 @@ export interface Snapshot {
 /** The video type whose live view is a sequence of JPEG pictures. */
 export const kVideoTypeMjpeg = 1;
 
-const kAnswerLimitMs = 20_000;
+const kAnswerTimeoutMs = 20_000;
 
 /** A request that failed; `message` is for the user. */
 export class ServerError extends Error {
@@ -84,7 +84,7 @@ async function failureOf(answer: Response): Promise<ServerError> {
   try {
     failure = ((await answer.json()) as Failure | null) ?? {};
   } catch {
-    // A web server's own error page is no JSON; the status says enough.
+    // A web server's own error page is not JSON; the status says enough.
   }
   return new ServerError(answer.status, failure.error?.code ?? 0, sentenceFor(answer.status, failure.error?.message));
 }
@@ -127,8 +127,8 @@ export class Server {
   }
 
   /** One picture in the camera's usual size. */
-  async snapshot(camera: Camera, owner?: AbortSignal, limitMs = kAnswerLimitMs): Promise<Snapshot> {
-    const deadline = new Deadline(limitMs, owner);
+  async snapshot(camera: Camera, owner?: AbortSignal, timeoutMs = kAnswerTimeoutMs): Promise<Snapshot> {
+    const deadline = new Deadline(timeoutMs, owner);
     try {
       const answer = await this.#still(camera, deadline);
       const captured = Number(answer.headers.get("X-Capture-Time"));
@@ -140,7 +140,7 @@ export class Server {
     }
   }
 
-  // What the camera sends is a picture already, or has to be made into one by the host.
+  // A JPEG camera's picture comes as it is; of other cameras the host makes one.
   #still(camera: Camera, deadline: Deadline): Promise<Response> {
     const own = camera.video_type === kVideoTypeMjpeg || camera.server ? playOf(camera, { snapshot: "1" }) : null;
     if (own) return this.media(...own, deadline);
@@ -157,7 +157,7 @@ export class Server {
     });
   }
 
-  /** An answer of pictures; a JSON answer in their place, whatever its status, is a failure. */
+  /** An answer that holds pictures; a JSON answer, whatever its status, is a failure. */
   async media(
     api: string,
     method: string,
@@ -168,18 +168,18 @@ export class Server {
     if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
     if (answer.status === 401) this.#onSessionEnd();
     const failure = await failureOf(answer);
-    // For a camera that cannot be opened the host says that its handler gave no answer, which nobody would understand.
-    throw failure.status === 502 ? new ServerError(502, failure.code, "No picture came.") : failure;
+    // For a camera that cannot be opened the host says that its handler gave no answer, which no user would understand.
+    throw failure.status === 502 ? new ServerError(502, failure.code, "No picture was received.") : failure;
   }
 
-  /** The data of an answer. With `form` or `json` the request is a POST. A session that has ended is told unless `quiet`. */
+  /** The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported. */
   async call<Data>(
     api: string,
     method: string,
     parameters: Record<string, string>,
     how: { form?: Record<string, string>; json?: unknown; quiet?: boolean } = {},
   ): Promise<Data> {
-    const deadline = new Deadline(kAnswerLimitMs);
+    const deadline = new Deadline(kAnswerTimeoutMs);
     try {
       const answer = await fetch(address(api, method, parameters), {
         signal: deadline.signal,
@@ -215,7 +215,7 @@ export function address(api: string, method: string, parameters: Record<string, 
 
 export function asServerError(error: unknown): ServerError {
   if (error instanceof ServerError) return error;
-  // fetch speaks of a lost connection as TypeError, of our deadline as AbortError; JSON that is none is a SyntaxError.
-  if (error instanceof SyntaxError) return new ServerError(502, 0, "The server's answer makes no sense.");
+  // fetch reports a lost connection as TypeError and our deadline as AbortError; invalid JSON is a SyntaxError.
+  if (error instanceof SyntaxError) return new ServerError(502, 0, "The server's answer is not valid.");
   return new ServerError(0, 0, sentenceFor(0, undefined));
 }

@@ -1,0 +1,68 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Goes from the log-in to the screens, from screen to screen as the address says, and back to the log-in.
+
+import { Server, ServerError, type Account } from "../wire/server";
+import { EventsScreen } from "./screens/events_screen";
+import { loginScreen } from "./screens/login_screen";
+import { MapsScreen } from "./screens/maps_screen";
+import { followRoute, openScreen } from "./screens/route";
+import type { Screen } from "./screens/screen";
+import { WallScreen } from "./screens/wall_screen";
+import { element } from "./widgets/dom";
+import { hideNotice } from "./widgets/notice";
+
+const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen };
+
+export class App {
+  readonly #root: HTMLElement;
+  readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
+  #account: Account | null = null;
+  /** Null at the log-in. */
+  #screen: Screen | null = null;
+
+  constructor(root: HTMLElement) {
+    this.#root = root;
+  }
+
+  async start(): Promise<void> {
+    this.#root.replaceChildren(element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" }));
+    followRoute(() => this.#followRoute());
+    try {
+      const account = await this.#server.status();
+      if (account) this.#showScreens(account);
+      else this.#showLogin("");
+    } catch (error) {
+      this.#showLogin(error instanceof ServerError ? error.message : String(error));
+    }
+  }
+
+  /** `hint` says why the user is here again, if there is a reason. */
+  #showLogin(hint: string): void {
+    // A screen closes many requests, each of which may report once more that the session has ended.
+    if (this.#screen === null && this.#root.querySelector(".login")) return;
+    this.#screen?.close();
+    this.#screen = this.#account = null;
+    hideNotice();
+    this.#root.replaceChildren(loginScreen(this.#server, hint, (account) => this.#showScreens(account)));
+    this.#root.querySelector("input")?.focus();
+  }
+
+  #showScreens(account: Account): void {
+    this.#account = account;
+    this.#followRoute();
+  }
+
+  /** False where the user stays at what is shown. */
+  #followRoute(): boolean {
+    const name = openScreen();
+    if (!this.#account) return true;
+    if (this.#screen?.name === name) return this.#screen.followRoute();
+    if (this.#screen && !this.#screen.canLeave()) return false;
+    this.#screen?.close();
+    const session = { server: this.#server, account: this.#account, onLogOut: () => this.#showLogin("") };
+    this.#screen = new kScreens[name](session);
+    this.#root.replaceChildren(this.#screen.root);
+    return true;
+  }
+}

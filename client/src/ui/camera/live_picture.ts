@@ -1,0 +1,114 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One camera's live picture, with the message that lies over it while it is not live; used by tiles and the large view.
+
+import { Feed } from "../../live/feed";
+import type { SignalState } from "../../live/signal_state";
+import type { Unplayable } from "../../live/unplayable";
+import { draw, element, setText } from "../widgets/dom";
+import { icon } from "../widgets/icons";
+import { signalText } from "../widgets/text";
+import { unplayableHint } from "./unplayable_hint";
+
+/** Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. */
+export type PictureState = SignalState | { kind: "unavailable"; reason: string };
+
+/** An answer of the server that will not change by asking again. */
+const kNoSuchApi = 404;
+
+export class LivePicture {
+  readonly canvas = element("canvas", { "aria-hidden": "true" });
+  readonly feed: Feed;
+  readonly root: HTMLElement;
+  readonly #unplayable: () => Unplayable | null;
+  readonly #changed: () => void;
+  readonly #canLink: boolean;
+  readonly #sentence = element("p", { class: "message-sentence" });
+  readonly #reason = element("p", { class: "message-reason" });
+  readonly #hint = element("p", { class: "hint", role: "note" });
+  #hintFor: Unplayable | null = null;
+  #frames = 0;
+  #rateSinceMs = performance.now();
+  #framesPerSecond = 0;
+
+  /**
+   * `unplayable` says why still pictures are shown; `changed` is called after the state on the screen changed: call
+   * `refresh` once when you are ready for it. Links are shown where `canLink`, which is not so within a button.
+   */
+  constructor(unplayable: () => Unplayable | null, changed: () => void, canLink: boolean) {
+    this.#unplayable = unplayable;
+    this.#canLink = canLink;
+    this.#changed = changed;
+    this.feed = new Feed(
+      ({ image }) => {
+        this.showStill(image);
+        this.#frames += 1;
+        image.close();
+      },
+      () => this.refresh(),
+    );
+    const message = element(
+      "div",
+      { class: "message" },
+      element("div", { class: "spinner" }),
+      icon("noSignal"),
+      this.#sentence,
+      this.#reason,
+    );
+    this.root = element("div", { class: "picture" }, this.canvas, message, this.#hint);
+  }
+
+  state(): PictureState {
+    const state = this.feed.state();
+    const unplayable = this.#unplayable();
+    const isShown = state.kind === "live" || state.kind === "idle";
+    if (!unplayable || isShown || this.feed.failure?.status !== kNoSuchApi) return state;
+    return { kind: "unavailable", reason: unplayable.reason };
+  }
+
+  get hasPicture(): boolean {
+    return this.root.classList.contains("has-picture");
+  }
+
+  /** Draws a picture that says nothing of the signal: the state stays as it is. */
+  showStill(image: ImageBitmap | VideoFrame | HTMLCanvasElement): void {
+    draw(this.canvas, image);
+    this.root.classList.add("has-picture");
+  }
+
+  /** Size and rate of what is shown, for people who set up cameras; empty while nothing is live. */
+  description(): string {
+    const nowMs = performance.now();
+    const elapsedMs = nowMs - this.#rateSinceMs;
+    if (elapsedMs >= 1000) {
+      this.#framesPerSecond = Math.round((this.#frames * 1000) / elapsedMs);
+      this.#frames = 0;
+      this.#rateSinceMs = nowMs;
+    }
+    const isStream = this.feed.source?.pollIntervalMs === 0;
+    if (this.state().kind !== "live" || !isStream || this.#framesPerSecond === 0) return "";
+    return `${this.canvas.width} × ${this.canvas.height} · ${this.#framesPerSecond} fps`;
+  }
+
+  /** Brings the screen up to date with the clock. */
+  refresh(): void {
+    const state = this.state();
+    const sentence = state.kind === "unavailable" ? state.reason : signalText(state);
+    setText(this.#sentence, sentence.charAt(0).toUpperCase() + sentence.slice(1));
+    const noStills = "The server has no still pictures of this camera.";
+    setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
+    this.#showHint(state.kind === "unavailable" ? null : this.#unplayable());
+    if (this.root.dataset["state"] !== state.kind) {
+      this.root.dataset["state"] = state.kind;
+      this.#changed();
+    }
+  }
+
+  #showHint(unplayable: Unplayable | null): void {
+    if (this.#hintFor === unplayable) return;
+    this.#hintFor = unplayable;
+    // The wall shows a remedy once for all its tiles.
+    const isShownHere = unplayable && (this.#canLink || !unplayable.remedy);
+    this.#hint.replaceChildren(...(isShownHere ? unplayableHint(unplayable) : []));
+  }
+}

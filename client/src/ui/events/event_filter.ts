@@ -1,0 +1,117 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which cameras and which kinds of events the timeline and the list show; kept for the next visit.
+
+import { kEventKinds, type EventKind } from "../../playback/coverage";
+import type { Group } from "../../wire/recordings";
+import type { Camera } from "../../wire/server";
+import { element } from "../widgets/dom";
+import { kKindNames } from "./event_list";
+
+/** As many as the timeline shows without scrolling; the user may choose more. */
+const kDefaultCameras = 8;
+const kMaxCameras = 32;
+const kStorageKey = "lookhaven.events";
+
+interface Stored {
+  cameras?: number[];
+  kinds?: EventKind[];
+}
+
+export class EventFilter {
+  readonly root: HTMLElement;
+  readonly #changed: () => void;
+  readonly #groupRow = element("div", { class: "groups", role: "group", "aria-label": "Camera groups" });
+  readonly #cameraRow = element("div", { class: "cameras" });
+  readonly #summary = element("summary", {}, "Cameras");
+  #cameras: readonly Camera[] = [];
+  #chosen = new Set<number>();
+  #kinds = new Set<EventKind>(kEventKinds);
+
+  constructor(changed: () => void) {
+    this.#changed = changed;
+    const stored = readStored();
+    if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds!.includes(kind)));
+    if (stored.cameras) this.#chosen = new Set(stored.cameras);
+    const kinds = kEventKinds.map((kind) => {
+      const box = element("input", { type: "checkbox", checked: this.#kinds.has(kind) });
+      box.addEventListener("change", () => {
+        if (box.checked) this.#kinds.add(kind);
+        else this.#kinds.delete(kind);
+        this.#save();
+      });
+      return element("label", { class: "chip" }, box, element("span", { class: "row-swatch", "data-kind": kind }), kKindNames[kind]);
+    });
+    const cameras = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
+    const kindRow = element("div", { class: "chips", role: "group", "aria-label": "Kinds of events" }, ...kinds);
+    this.root = element("section", { class: "filter", "aria-label": "Filter" }, cameras, kindRow);
+  }
+
+  get cameras(): Camera[] {
+    return this.#cameras.filter(({ id }) => this.#chosen.has(id));
+  }
+
+  get kinds(): ReadonlySet<EventKind> {
+    return this.#kinds;
+  }
+
+  setCameras(cameras: readonly Camera[]): void {
+    this.#cameras = cameras;
+    if (!cameras.some(({ id }) => this.#chosen.has(id))) {
+      this.#chosen = new Set(cameras.slice(0, kDefaultCameras).map(({ id }) => id));
+    }
+    this.#showCameras();
+  }
+
+  setGroups(groups: readonly Group[]): void {
+    const all = { name: "All", cameras: this.#cameras.map(({ id }) => id) };
+    this.#groupRow.replaceChildren(
+      ...[all, ...groups].map(({ name, cameras }) => {
+        const button = element("button", { type: "button", class: "chip" }, name);
+        button.addEventListener("click", () => this.#choose(cameras));
+        return button;
+      }),
+    );
+  }
+
+  /** Adds a camera of which something is to be played. */
+  include(camera: number): void {
+    if (this.#chosen.has(camera) || !this.#cameras.some(({ id }) => id === camera)) return;
+    this.#choose([...this.#chosen, camera]);
+  }
+
+  #choose(cameras: readonly number[]): void {
+    this.#chosen = new Set(cameras.slice(0, kMaxCameras));
+    this.#showCameras();
+    this.#save();
+  }
+
+  #showCameras(): void {
+    this.#summary.textContent = `Cameras · ${this.cameras.length} of ${this.#cameras.length}`;
+    this.#cameraRow.replaceChildren(
+      ...this.#cameras.map(({ id, name }) => {
+        const box = element("input", { type: "checkbox", checked: this.#chosen.has(id) });
+        box.addEventListener("change", () => {
+          if (box.checked) this.#chosen.add(id);
+          else this.#chosen.delete(id);
+          this.#summary.textContent = `Cameras · ${this.cameras.length} of ${this.#cameras.length}`;
+          this.#save();
+        });
+        return element("label", { class: "camera-choice" }, box, element("span", {}, name));
+      }),
+    );
+  }
+
+  #save(): void {
+    localStorage.setItem(kStorageKey, JSON.stringify({ cameras: [...this.#chosen], kinds: [...this.#kinds] } satisfies Stored));
+    this.#changed();
+  }
+}
+
+function readStored(): Stored {
+  try {
+    return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Stored | null) ?? {};
+  } catch {
+    return {};
+  }
+}

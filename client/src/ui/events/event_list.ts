@@ -1,0 +1,144 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The events and marks of a span as rows, newest first; only the rows on the screen exist.
+
+import { kindOf, type EventKind } from "../../playback/coverage";
+import { isSameFootage, type Footage, type FootageRef } from "../../wire/recordings";
+import { element, setText } from "../widgets/dom";
+import { clockTime, duration, shortDate } from "../widgets/text";
+
+/** Rows kept beyond the visible ones, so that scrolling shows no gap. */
+const kOverscanRows = 4;
+
+export const kKindNames: Record<EventKind, string> = {
+  continuous: "Continuous",
+  alarm: "Alarm",
+  alert: "Alerts",
+  pos: "POS",
+};
+
+export class EventList {
+  readonly root: HTMLElement;
+  readonly #onOpen: (footage: Footage) => void;
+  readonly #nameOf: (camera: number) => string;
+  readonly #head = element("h2", { class: "list-head" });
+  readonly #box = element("div", { class: "list-box" });
+  readonly #space = element("div", { class: "list-space", role: "list" });
+  readonly #note = element("p", { class: "list-note" });
+  readonly #resized = new ResizeObserver(() => this.#render());
+  #footage: readonly Footage[] = [];
+  #selected: FootageRef | null = null;
+  #mustReveal = false;
+  /** The row that the keys move. */
+  #at = 0;
+
+  constructor(nameOf: (camera: number) => string, onOpen: (footage: Footage) => void) {
+    this.#nameOf = nameOf;
+    this.#onOpen = onOpen;
+    this.#box.append(this.#space, this.#note);
+    this.root = element("section", { class: "list", "aria-label": "Events" }, this.#head, this.#box);
+    this.#box.addEventListener("scroll", () => this.#render());
+    this.#box.addEventListener("keydown", (event) => this.#key(event));
+    this.#resized.observe(this.#box);
+  }
+
+  /** Newest first. `note` says why there is nothing, or not all. */
+  show(footage: readonly Footage[], head: string, note: string): void {
+    this.#footage = footage;
+    setText(this.#head, head);
+    setText(this.#note, note);
+    this.#revealSelected();
+    this.#render();
+  }
+
+  select(selected: FootageRef | null): void {
+    if (selected?.id === this.#selected?.id && selected?.kind === this.#selected?.kind) return;
+    this.#selected = selected;
+    this.#mustReveal = true;
+    this.#revealSelected();
+    this.#render();
+  }
+
+  close(): void {
+    this.#resized.disconnect();
+  }
+
+  get #rowPx(): number {
+    return parseFloat(getComputedStyle(this.root).getPropertyValue("--row")) || 44;
+  }
+
+  /** Scrolls to a new selection once, as soon as it is listed. */
+  #revealSelected(): void {
+    const at = this.#mustReveal ? this.#footage.findIndex((one) => isSameFootage(one, this.#selected)) : -1;
+    if (at < 0) return;
+    this.#mustReveal = false;
+    // The new rows must have made room before it can be scrolled to.
+    this.#space.style.height = `${this.#footage.length * this.#rowPx}px`;
+    this.#reveal(at);
+  }
+
+  #reveal(at: number): void {
+    const [top, row, box] = [this.#box.scrollTop, this.#rowPx, this.#box.clientHeight];
+    if (at * row < top) this.#box.scrollTop = at * row;
+    else if ((at + 1) * row > top + box) this.#box.scrollTop = (at + 1) * row - box;
+  }
+
+  #render(): void {
+    const row = this.#rowPx;
+    this.#space.style.height = `${this.#footage.length * row}px`;
+    const first = Math.max(0, Math.floor(this.#box.scrollTop / row) - kOverscanRows);
+    const last = Math.min(this.#footage.length, Math.ceil((this.#box.scrollTop + this.#box.clientHeight) / row) + kOverscanRows);
+    const kept = new Map([...this.#space.children].map((child) => [(child as HTMLElement).dataset["ref"], child]));
+    const wanted = this.#footage.slice(first, last).map((one, index) => {
+      const old = kept.get(`${one.kind}${one.id}`) as HTMLElement | undefined;
+      const made = old ?? this.#newRow(one);
+      this.#fill(made, one, first + index, row);
+      return made;
+    });
+    for (const child of [...this.#space.children]) if (!wanted.includes(child as HTMLElement)) child.remove();
+    for (const made of wanted) if (!made.isConnected) this.#space.append(made);
+  }
+
+  #newRow({ kind, id }: FootageRef): HTMLElement {
+    const parts = ["row-swatch", "row-time", "row-name", "row-text", "row-side"].map((name) => element("span", { class: name }));
+    const button = element("button", { type: "button", class: "row-open" }, ...parts);
+    const row = element("div", { class: "row", role: "listitem", "data-ref": `${kind}${id}` }, button);
+    button.addEventListener("click", () => {
+      const one = this.#footage[Number(row.dataset["at"])];
+      if (one) this.#onOpen(one);
+    });
+    return row;
+  }
+
+  #fill(row: HTMLElement, one: Footage, at: number, rowPx: number): void {
+    const button = row.firstElementChild as HTMLButtonElement;
+    const [swatch, time, name, text, side] = [...button.children] as [HTMLElement, HTMLElement, HTMLElement, HTMLElement, HTMLElement];
+    const kind = kindOf(one);
+    row.dataset["at"] = String(at);
+    row.style.transform = `translateY(${at * rowPx}px)`;
+    swatch.dataset["kind"] = kind;
+    setText(time, clockTime(one.moment * 1000));
+    setText(name, this.#nameOf(one.camera));
+    setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
+    setText(side, one.isGrowing ? "recording" : one.isSaved ? duration(one.stop - one.start) : "no footage");
+    side.classList.toggle("growing", one.isGrowing);
+    button.disabled = !one.isSaved;
+    button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
+    button.title = `${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}${one.text ? `\n${one.text}` : ""}`;
+    button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
+  }
+
+  #key(event: KeyboardEvent): void {
+    const page = Math.max(1, Math.floor(this.#box.clientHeight / this.#rowPx) - 1);
+    const steps: Record<string, number> = { ArrowDown: 1, ArrowUp: -1, PageDown: page, PageUp: -page };
+    const row = (event.target as Element).closest<HTMLElement>(".row");
+    const step = steps[event.key] ?? (event.key === "Home" ? -Infinity : event.key === "End" ? Infinity : 0);
+    if (!row || step === 0) return;
+    event.preventDefault();
+    event.stopPropagation();
+    this.#at = Math.max(0, Math.min(Number(row.dataset["at"]) + step, this.#footage.length - 1));
+    this.#reveal(this.#at);
+    this.#render();
+    this.#space.querySelector<HTMLElement>(`[data-at="${this.#at}"] button`)?.focus({ preventScroll: true });
+  }
+}

@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The transport controls below the stage: play, step, rate, what is playing, download.
+
+import { kRates } from "../../playback/player";
+import type { SyncPlayback } from "../../playback/sync_playback";
+import type { Recordings } from "../../wire/recordings";
+import { iconButton } from "../widgets/button";
+import { element, setText } from "../widgets/dom";
+import { icon } from "../widgets/icons";
+import { clockTime, rateText, shortDate } from "../widgets/text";
+
+export interface TransportActions {
+  toggle(): void;
+  step(by: number): void;
+  /** To the previous (-1) or next (1) event. */
+  skip(by: 1 | -1): void;
+  rate(rate: number): void;
+  now(): void;
+  fullScreen(): void;
+}
+
+export class Transport {
+  readonly root: HTMLElement;
+  readonly #playback: SyncPlayback;
+  readonly #recordings: Recordings;
+  readonly #play: HTMLButtonElement;
+  readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
+  readonly #time = element("time", { class: "transport-time" });
+  readonly #frame = element("span", { class: "transport-frame" });
+  readonly #growing = element("span", { class: "transport-growing", hidden: true }, "recording");
+  readonly #download = element("a", { class: "icon-button", "aria-label": "Download this recording", title: "Download this recording" });
+
+  constructor(playback: SyncPlayback, recordings: Recordings, actions: TransportActions) {
+    this.#playback = playback;
+    this.#recordings = recordings;
+    this.#play = iconButton("play", "Play", () => actions.toggle(), "Space");
+    this.#play.classList.add("play");
+    this.#play.append(icon("pause"));
+    this.#download.append(icon("download"));
+    for (const rate of kRates) this.#rate.append(element("option", { value: String(rate) }, rateText(rate)));
+    this.#rate.addEventListener("change", () => actions.rate(Number(this.#rate.value)));
+    const buttons = element(
+      "div",
+      { class: "transport-buttons", role: "group", "aria-label": "Playback" },
+      iconButton("eventBefore", "Previous event", () => actions.skip(-1), "↑"),
+      iconButton("stepBack", "Previous frame", () => actions.step(-1), "←"),
+      this.#play,
+      iconButton("stepForward", "Next frame", () => actions.step(1), "→"),
+      iconButton("eventAfter", "Next event", () => actions.skip(1), "↓"),
+      this.#rate,
+    );
+    const about = element("div", { class: "transport-about" }, this.#time, this.#growing, this.#frame);
+    const side = element(
+      "div",
+      { class: "transport-side" },
+      iconButton("now", "Go to now", () => actions.now()),
+      this.#download,
+      iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
+    );
+    this.root = element("div", { class: "transport" }, buttons, about, side);
+    this.refresh();
+  }
+
+  refresh(): void {
+    const { isPlaying, lead, playheadMs, rate } = this.#playback;
+    const footage = lead?.player.footage ?? null;
+    this.#play.setAttribute("aria-label", isPlaying ? "Pause" : "Play");
+    this.#play.title = `${isPlaying ? "Pause" : "Play"} (Space)`;
+    this.root.dataset["playing"] = String(isPlaying);
+    if (this.#rate.value !== String(rate)) this.#rate.value = String(rate);
+    setText(this.#time, playheadMs === null ? "" : `${shortDate(playheadMs)} ${clockTime(playheadMs)}`);
+    this.#growing.hidden = !footage?.isGrowing;
+    const frames = footage && footage.frameCount > 0 && !footage.isGrowing ? ` of ${footage.frameCount}` : "";
+    setText(this.#frame, footage ? `frame ${(lead?.player.index ?? 0) + 1}${frames}` : "");
+    if (footage) this.#download.href = this.#recordings.downloadAddress(footage);
+    else this.#download.removeAttribute("href");
+  }
+}

@@ -1,0 +1,289 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The recordings of all cameras: the stage with its players, the timeline below; calendar, filter and list beside.
+
+import { kindOf } from "../../playback/coverage";
+import { FootageCache } from "../../playback/footage_cache";
+import { kRates } from "../../playback/player";
+import { RecordedDays } from "../../playback/recorded_days";
+import { SyncPlayback } from "../../playback/sync_playback";
+import { isSameFootage, Recordings, type Footage } from "../../wire/recordings";
+import { ServerError, type Camera } from "../../wire/server";
+import { Calendar } from "../events/calendar";
+import { EventFilter } from "../events/event_filter";
+import { EventList } from "../events/event_list";
+import { Stage } from "../events/stage";
+import { Transport } from "../events/transport";
+import { spanText } from "../timeline/time_scale";
+import { Timeline } from "../timeline/timeline";
+import { iconButton } from "../widgets/button";
+import { element, setText } from "../widgets/dom";
+import { toggleFullScreen } from "../widgets/full_screen";
+import { notify } from "../widgets/notice";
+import { openFootage, recordFootage } from "./route";
+import { Screen, type Session } from "./screen";
+
+const kRefreshMs = 250;
+const kReloadIntervalMs = 5_000;
+const kDaysIntervalMs = 300_000;
+/** Four pictures fill a stage, and four streams are what a browser carries beside its other requests. */
+const kMaxPlayers = 4;
+/** The list is for reading: a longer one is cut, and says so. */
+const kMaxRows = 20_000;
+const kZoomStep = 2;
+const kSettleMs = 150;
+
+export class EventsScreen extends Screen {
+  readonly #recordings = new Recordings(this.server);
+  readonly #cache = new FootageCache(this.#recordings, () => this.#showFootage());
+  readonly #days = new RecordedDays(this.#recordings, () => this.#showDays());
+  readonly #playback = new SyncPlayback(this.#recordings, this.#cache, () => this.#showPlaybackSoon());
+  readonly #filter = new EventFilter(() => this.#showLanes());
+  readonly #list = new EventList((camera) => this.#nameOf(camera), (footage) => this.#open(footage));
+  readonly #stage: Stage;
+  readonly #timeline: Timeline;
+  readonly #calendar: Calendar;
+  readonly #transport: Transport;
+  readonly #status = element("p", { class: "bar-status" });
+  #cameras: Camera[] = [];
+  /** What the address asks for while it is being looked up. */
+  #opening = "";
+  /** Why there is no list of cameras; empty when there is. */
+  #error = "";
+  #settling: ReturnType<typeof setTimeout> | undefined;
+  #animationFrame = 0;
+
+  constructor(session: Session) {
+    super("events", session);
+    const maxPlayers = Math.max(1, Math.min(session.account.players_per_session ?? 1, kMaxPlayers));
+    this.#stage = new Stage(this.#playback, maxPlayers, (camera) => this.#nameOf(camera), () => this.#showLanes());
+    this.#timeline = new Timeline(this.#cache, this.#days, {
+      seek: (atMs, camera) => this.#seek(atMs, camera),
+      open: (footage) => this.#open(footage),
+      scrub: (atMs) => this.#playback.seek(atMs),
+      toggle: (camera) => this.#stage.toggle(camera),
+      moved: () => this.#onTimelineMoved(),
+    });
+    this.#calendar = new Calendar(this.#days, () => this.#chosenCameras(), (dayMs) => this.#pickDay(dayMs));
+    this.#transport = new Transport(this.#playback, this.#recordings, {
+      toggle: () => this.#togglePlaying(),
+      step: (by) => this.#playback.step(by),
+      skip: (by) => void this.#skip(by),
+      rate: (rate) => this.#playback.setRate(rate),
+      now: () => this.#timeline.showNow(),
+      fullScreen: toggleFullScreen,
+    });
+    this.#build();
+    const onVisibility = () => this.#onVisibility();
+    document.addEventListener("visibilitychange", onVisibility, { signal: this.closed });
+    this.every(kRefreshMs, () => this.#refresh());
+    this.every(kReloadIntervalMs, () => this.#reload());
+    this.every(kDaysIntervalMs, () => this.#days.clear());
+    void this.#load();
+  }
+
+  override close(): void {
+    super.close();
+    clearTimeout(this.#settling);
+    cancelAnimationFrame(this.#animationFrame);
+    this.#playback.close();
+    this.#timeline.close();
+    this.#list.close();
+  }
+
+  followRoute(): boolean {
+    void this.#openRoute();
+    return true;
+  }
+
+  protected pressKey(event: KeyboardEvent): boolean {
+    const target = event.target as HTMLElement;
+    const isTyping = /^(SELECT|SUMMARY)$/.test(target.tagName) || target.closest("label") !== null;
+    const isButton = /^(BUTTON|A|INPUT)$/.test(target.tagName);
+    if (isTyping) return false;
+    if (event.key === " " && !isButton) this.#togglePlaying();
+    else if (event.key === "ArrowLeft") this.#playback.step(event.shiftKey ? -10 : -1);
+    else if (event.key === "ArrowRight") this.#playback.step(event.shiftKey ? 10 : 1);
+    else if (event.key === "ArrowUp") void this.#skip(-1);
+    else if (event.key === "ArrowDown") void this.#skip(1);
+    else if (event.key === "[") this.#changeRate(-1);
+    else if (event.key === "]") this.#changeRate(1);
+    else if (event.key.toLowerCase() === "f") toggleFullScreen();
+    else return false;
+    return true;
+  }
+
+  #build(): void {
+    const zoom = element(
+      "div",
+      { class: "timeline-zoom", role: "group", "aria-label": "Zoom" },
+      iconButton("zoomOut", "Show more time", () => this.#timeline.zoom(kZoomStep), "-"),
+      iconButton("zoomIn", "Show less time", () => this.#timeline.zoom(1 / kZoomStep), "+"),
+    );
+    this.#transport.root.append(zoom);
+    const side = element("aside", { class: "side" }, this.#calendar.root, this.#filter.root, this.#list.root);
+    const main = element("div", { class: "events-main" }, this.#stage.root, this.#transport.root, this.#timeline.root);
+    this.addToBar(this.#status);
+    this.front.append(element("div", { class: "events-body" }, main, side));
+  }
+
+  async #load(): Promise<void> {
+    try {
+      this.#cameras = (await this.server.cameras()).camera ?? [];
+      this.#error = "";
+    } catch (error) {
+      this.#error = error instanceof ServerError ? error.message : String(error);
+      return this.#refresh();
+    }
+    this.#filter.setCameras(this.#cameras);
+    this.#filter.setGroups([]);
+    // A host without a catalogue has no groups.
+    void this.#recordings.groups().then(
+      (groups) => this.#filter.setGroups(groups),
+      () => undefined,
+    );
+    this.#showLanes();
+    await this.#openRoute();
+  }
+
+  #chosenCameras(): number[] {
+    return this.#filter.cameras.map(({ id }) => id);
+  }
+
+  #nameOf(camera: number): string {
+    return this.#cameras.find(({ id }) => id === camera)?.name ?? `Camera ${camera}`;
+  }
+
+  /** Opens what the address names, unless it is being shown. */
+  async #openRoute(): Promise<void> {
+    const wanted = openFootage();
+    // Back from what is being played ends it.
+    if (!wanted) return this.#playback.close();
+    if (isSameFootage(wanted, this.#playback.lead?.player.footage)) return;
+    const opening = (this.#opening = `${wanted.kind}${wanted.id}`);
+    try {
+      const footage = await this.#recordings.find(wanted);
+      if (this.#opening !== opening) return;
+      if (footage) this.#open(footage);
+      else notify("This recording no longer exists, or you do not have permission to view it.");
+    } catch (error) {
+      notify(error instanceof ServerError ? error.message : String(error));
+    }
+  }
+
+  #open(footage: Footage): void {
+    this.#filter.include(footage.camera);
+    this.#stage.include(footage.camera);
+    this.#timeline.reveal(footage.start * 1000);
+    this.#playback.open(footage);
+  }
+
+  #seek(atMs: number, camera: number): void {
+    this.#stage.include(camera);
+    this.#playback.seek(atMs, camera, true);
+  }
+
+  #showLanes(): void {
+    const lanes = this.#filter.cameras;
+    if (this.#stage.cameras.length === 0 && lanes[0]) return this.#stage.show([lanes[0].id]);
+    this.#timeline.setKinds(this.#filter.kinds);
+    this.#timeline.setLanes(lanes.map(({ id, name }) => ({ camera: id, name })), this.#stage.cameras);
+    this.#calendar.refresh();
+    this.#showFootage();
+  }
+
+  #pickDay(dayMs: number): void {
+    this.#timeline.showDay(dayMs);
+    this.#calendar.select(dayMs);
+  }
+
+  /** Loads what the timeline shows now, but not while it is still being moved. */
+  #onTimelineMoved(): void {
+    const { startMs, endMs } = this.#timeline.scale;
+    if (this.#timeline.showsEvents) this.#calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
+    clearTimeout(this.#settling);
+    this.#settling = setTimeout(() => this.#reload(), kSettleMs);
+    this.#showPlaybackSoon();
+  }
+
+  #reload(): void {
+    if (document.hidden || this.#cameras.length === 0) return;
+    const { startMs, endMs } = this.#timeline.scale;
+    if (!this.#timeline.showsEvents) this.#days.load(this.#chosenCameras(), startMs, endMs);
+    else void this.#cache.load(this.#chosenCameras(), startMs / 1000, endMs / 1000, true);
+    this.#showFootage();
+  }
+
+  #showDays(): void {
+    this.#calendar.refresh();
+    this.#timeline.redraw();
+  }
+
+  #showFootage(): void {
+    this.#timeline.redraw();
+    const { startMs, endMs } = this.#timeline.scale;
+    const span = spanText(startMs, Math.min(endMs, Date.now()));
+    if (!this.#timeline.showsEvents) return this.#list.show([], span, "Show four days or less to list events.");
+    const [fromS, toS] = [startMs / 1000, endMs / 1000];
+    const rows = this.#chosenCameras()
+      .flatMap((camera) => this.#cache.get(camera, fromS, toS).footage)
+      .filter((one) => one.stop >= fromS && one.start < toS && this.#filter.kinds.has(kindOf(one)))
+      .sort((one, other) => other.start - one.start || other.id - one.id);
+    const head = `${rows.length} ${rows.length === 1 ? "event" : "events"} · ${span}`;
+    const nothing = this.#cache.isBusy ? "" : "No events in this time span. The calendar marks the days with recordings.";
+    const note = rows.length > kMaxRows ? "Show less time to list older events." : rows.length > 0 ? "" : nothing;
+    this.#list.show(rows.slice(0, kMaxRows), head, note);
+  }
+
+  /** At most once for each picture of the screen, however many frames the players show. */
+  #showPlaybackSoon(): void {
+    this.#animationFrame ||= requestAnimationFrame(() => {
+      this.#animationFrame = 0;
+      this.#showPlayback();
+    });
+  }
+
+  #showPlayback(): void {
+    const footage = this.#playback.lead?.player.footage ?? null;
+    this.#stage.refresh();
+    this.#timeline.setPlayhead(this.#playback.playheadMs, footage, this.#playback.isPlaying);
+    this.#transport.refresh();
+    this.#list.select(footage);
+    if (!footage) return;
+    this.#opening = "";
+    recordFootage(footage);
+  }
+
+  #refresh(): void {
+    this.#playback.tick();
+    const error = this.#error || this.#cache.error;
+    const empty = this.#cameras.length === 0 && this.progress.hidden ? "No cameras" : "";
+    this.progress.hidden = !this.#cache.isBusy && (this.#cameras.length > 0 || error !== "");
+    setText(this.#status, error || empty);
+    this.#status.classList.toggle("alarm", error !== "");
+  }
+
+  #togglePlaying(): void {
+    if (this.#playback.isPlaying) this.#playback.pause();
+    else this.#playback.play();
+  }
+
+  async #skip(by: 1 | -1): Promise<void> {
+    const next = await this.#playback.adjacent(by);
+    if (!next) return notify(`There is no ${by > 0 ? "later" : "earlier"} event within six hours.`);
+    this.#timeline.reveal(next.start * 1000);
+    this.#playback.open(next, next.start * 1000, this.#playback.isPlaying);
+  }
+
+  /** What nobody sees is not played. */
+  #onVisibility(): void {
+    if (document.hidden) this.#playback.pause();
+    else this.#reload();
+  }
+
+  #changeRate(by: number): void {
+    const at = kRates.findIndex((rate) => rate === this.#playback.rate);
+    const rate = kRates[at + by];
+    if (rate !== undefined) this.#playback.setRate(rate);
+  }
+}

@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The log-in screen.
+
+import { ServerError, type Account, type Server } from "../../wire/server";
+import { element } from "../widgets/dom";
+import { icon } from "../widgets/icons";
+
+/** `hint` says why the user is here again, if there is a reason. */
+export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => void): HTMLElement {
+  const account = field("account", "Account", {
+    type: "text",
+    autocomplete: "username",
+    autocapitalize: "none",
+    spellcheck: "false",
+  });
+  const password = field("password", "Password", { type: "password", autocomplete: "current-password" });
+  const submit = element("button", { type: "submit", class: "button primary" }, "Log in");
+  const message = element("p", { class: "login-message", role: "alert" }, hint);
+  const form = element(
+    "form",
+    { class: "login-form", method: "post" },
+    element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven")),
+    account.row,
+    password.row,
+    message,
+    submit,
+  );
+
+  form.addEventListener("submit", (event) => {
+    event.preventDefault();
+    if (submit.getAttribute("aria-busy") === "true") return;
+    const empty = [account, password].find((one) => one.input.value === "");
+    if (empty) {
+      message.textContent = `Please enter your ${empty === account ? "account" : "password"}.`;
+      return empty.input.focus();
+    }
+    message.textContent = "";
+    submit.setAttribute("aria-busy", "true");
+    void server
+      .login(account.input.value, password.input.value)
+      .then(onLogin, (error: unknown) => {
+        message.textContent = error instanceof ServerError ? error.message : String(error);
+        password.input.select();
+      })
+      .finally(() => submit.removeAttribute("aria-busy"));
+  });
+  return element("main", { class: "login" }, form);
+}
+
+function field(name: string, label: string, attributes: Record<string, string>) {
+  const input = element("input", { class: "input", id: name, name, ...attributes });
+  return { input, row: element("label", { class: "field", for: name }, element("span", {}, label), input) };
+}

@@ -1,0 +1,150 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
+// there #event=7, #alert=8 or #pos=9; #maps, and there #map=2, and of that map a camera, #map=2&camera=5 or, of the
+// recording server 3, #map=2&camera=5@3.
+//
+// Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
+//               history has a number, by which a refused step is taken back.
+
+import type { FootageRef } from "../../wire/recordings";
+import type { Camera } from "../../wire/server";
+
+export type ScreenName = "wall" | "events" | "maps";
+
+const kPattern = /^#(camera|event|alert|pos)=(\d+)$/;
+const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?)?$/;
+
+/** What an entry of the browser's history keeps beside its address. */
+interface EntryState {
+  position: number;
+  /** Opened from the entry before, so that Back leads there. */
+  hasOpener: boolean;
+}
+
+interface Entry {
+  position: number;
+  address: string;
+}
+
+let shown: Entry = { position: 0, address: "" };
+
+/** Numbers an entry that came from a link or was typed; the browser makes none where the address is the same. */
+function currentEntry(): Entry {
+  const address = location.href;
+  const state = history.state as EntryState | null;
+  const position = state?.position ?? (address === shown.address ? shown.position : shown.position + 1);
+  if (!state) history.replaceState({ position, hasOpener: false } satisfies EntryState, "");
+  return { position, address };
+}
+
+/** Calls `follow` for each change of the address. Where that returns false, the address becomes again what it was. */
+export function followRoute(follow: () => boolean): void {
+  shown = currentEntry();
+  addEventListener("popstate", () => {
+    const [before, now] = [shown, currentEntry()];
+    if (now.position === before.position && now.address === before.address) return;
+    shown = now;
+    if (follow()) return;
+    shown = before;
+    if (now.position !== before.position) history.go(before.position - now.position);
+    else history.replaceState(history.state, "", before.address);
+  });
+}
+
+function push(hash: string, hasOpener: boolean): void {
+  history.pushState({ position: shown.position + 1, hasOpener } satisfies EntryState, "", hash);
+}
+
+function replace(hash: string, hasOpener: boolean): void {
+  history.replaceState({ position: shown.position, hasOpener } satisfies EntryState, "", hash);
+}
+
+/** Has the new address followed. */
+function announce(): void {
+  dispatchEvent(new PopStateEvent("popstate"));
+}
+
+function hasOpener(): boolean {
+  return (history.state as EntryState | null)?.hasOpener ?? false;
+}
+
+function opened(): { what: string; id: number } | null {
+  const found = kPattern.exec(location.hash);
+  return found ? { what: found[1]!, id: Number(found[2]) } : null;
+}
+
+export function openScreen(): ScreenName {
+  if (location.hash === "#maps" || kMapPattern.test(location.hash)) return "maps";
+  const what = opened()?.what;
+  return location.hash === "#events" || (what !== undefined && what !== "camera") ? "events" : "wall";
+}
+
+/** The id of the open camera; null means the wall. */
+export function openCamera(): number | null {
+  const open = opened();
+  return open?.what === "camera" ? open.id : null;
+}
+
+/** What is open on the events' screen. */
+export function openFootage(): FootageRef | null {
+  const open = opened();
+  return open && open.what !== "camera" ? { kind: open.what as FootageRef["kind"], id: open.id } : null;
+}
+
+/** Opens a camera. Going from one camera to the next leaves one entry in the history, not one for each. */
+export function showCamera(id: number): void {
+  if (openCamera() === null) push(`#camera=${id}`, true);
+  else replace(`#camera=${id}`, hasOpener());
+  announce();
+}
+
+export function showWall(): void {
+  if (openCamera() === null) return;
+  if (hasOpener()) return history.back();
+  replace(location.pathname + location.search, false);
+  announce();
+}
+
+/** Writes into the address what is being played; as with cameras, all of it is one entry in the history. */
+export function recordFootage({ kind, id }: FootageRef): void {
+  const hash = `#${kind}=${id}`;
+  if (location.hash === hash) return;
+  if (openFootage() === null) push(hash, false);
+  else replace(hash, false);
+  shown = currentEntry();
+}
+
+export interface OpenMap {
+  map: number;
+  /** What is seen large over the map. */
+  camera: Pick<Camera, "id" | "server"> | null;
+}
+
+export function openMap(): OpenMap | null {
+  const found = kMapPattern.exec(location.hash);
+  if (!found) return null;
+  return { map: Number(found[1]), camera: found[2] ? { id: Number(found[2]), server: Number(found[3] ?? 0) } : null };
+}
+
+/** Opens a map, or a camera over it. Each is an entry in the history, so that Back leads along the way that one came. */
+export function showMap(map: number, camera: OpenMap["camera"] = null): void {
+  const of = camera ? `&camera=${camera.id}${camera.server ? `@${camera.server}` : ""}` : "";
+  push(`#map=${map}${of}`, true);
+  announce();
+}
+
+/** Writes the map that is shown into an address that named none. */
+export function replaceRoute(map: number): void {
+  replace(`#map=${map}`, false);
+  shown = currentEntry();
+}
+
+/** Back from a camera to its map. */
+export function leaveMapCamera(): void {
+  const open = openMap();
+  if (!open?.camera) return;
+  if (hasOpener()) return history.back();
+  replace(`#map=${open.map}`, false);
+  announce();
+}

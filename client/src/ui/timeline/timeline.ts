@@ -1,0 +1,276 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The recordings of the cameras as lanes below a common axis: wheel, pinch and keys zoom, a drag pans, a click plays, and the
+// playhead is dragged along the axis.
+
+import { kindOf, type EventKind } from "../../playback/coverage";
+import type { FootageCache } from "../../playback/footage_cache";
+import { midnight, type RecordedDays } from "../../playback/recorded_days";
+import type { Footage, FootageRef } from "../../wire/recordings";
+import { element } from "../widgets/dom";
+import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
+import { clockTime, duration, shortDate } from "../widgets/text";
+import { TimeScale } from "./time_scale";
+import { coloursOf, kAxisPx, paintAxis, paintGrid, paintLane, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
+import { TimelineHint } from "./timeline_hint";
+
+export interface Lane {
+  camera: number;
+  name: string;
+}
+
+export interface TimelineActions {
+  /** A click: this time, on this camera. */
+  seek(atMs: number, camera: number): void;
+  /** A click on a mark. */
+  open(footage: Footage): void;
+  /** The playhead is dragged. */
+  scrub(atMs: number): void;
+  /** A click on a camera's name. */
+  toggle(camera: number): void;
+  /** Another span is shown. */
+  moved(): void;
+}
+
+/** Wider than this, single events are neither fetched nor drawn, but the days that have any. */
+const kMaxEventsSpanMs = 4 * 86_400_000;
+const kMarkPx = 6;
+const kKeyZoom = 1.6;
+const kStartSpanMs = 6 * 3_600_000;
+/** Of the span, kept free behind the playhead or the present. */
+const kAhead = 0.12;
+/** Of the span, how much may be still to come. */
+const kMaxAhead = 0.3;
+
+export class Timeline {
+  readonly root: HTMLElement;
+  readonly #cache: FootageCache;
+  readonly #days: RecordedDays;
+  readonly #actions: TimelineActions;
+  readonly #axis = element("canvas", { class: "timeline-axis", "aria-hidden": "true" });
+  readonly #canvas = element("canvas", {
+    class: "timeline-lanes",
+    tabindex: "0",
+    role: "slider",
+    "aria-label": "Timeline: plus and minus zoom, page keys move, End goes to now",
+  });
+  readonly #names = element("div", { class: "timeline-names" });
+  readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
+  readonly #hint = new TimelineHint(this.#drawn);
+  readonly #pointers: PanZoomPointers;
+  readonly #resized = new ResizeObserver(() => this.#resize());
+  #colours: Colours | null = null;
+  #scale = TimeScale.of(Date.now() - kStartSpanMs, Date.now() + kStartSpanMs * kAhead, 1000);
+  #lanes: readonly Lane[] = [];
+  #kinds: ReadonlySet<EventKind> = new Set();
+  #playheadMs: number | null = null;
+  #selected: FootageRef | null = null;
+  #animationFrame = 0;
+  #isScrubbing = false;
+
+  constructor(cache: FootageCache, days: RecordedDays, actions: TimelineActions) {
+    this.#cache = cache;
+    this.#days = days;
+    this.#actions = actions;
+    const scrolled = element("div", { class: "timeline-scroll" }, this.#names, this.#drawn);
+    const head = element("div", { class: "timeline-head" }, element("div", { class: "timeline-corner" }), this.#axis);
+    this.root = element("section", { class: "timeline", "aria-label": "Timeline" }, head, scrolled);
+    this.#resized.observe(this.#drawn);
+    const panZoom: PanZoomActions = {
+      pan: (px) => this.#show(this.#scale.panned(px)),
+      zoom: (factor, { x }) => this.zoom(1 / factor, x),
+    };
+    panZoomByWheel(this.#axis, panZoom);
+    panZoomByWheel(this.#canvas, panZoom);
+    this.#pointers = new PanZoomPointers(this.#canvas, panZoom, "x");
+    this.#listenToScrubbing();
+    this.#canvas.addEventListener("click", (event) => this.#click(event));
+    this.#canvas.addEventListener("pointerdown", () => this.#hint.hide());
+    this.#canvas.addEventListener("pointermove", (event) => this.#pointers.isPressed || this.#showHint(event));
+    this.#canvas.addEventListener("pointerleave", () => this.#hint.hide());
+    this.#canvas.addEventListener("keydown", (event) => this.#pressKey(event));
+  }
+
+  get scale(): TimeScale {
+    return this.#scale;
+  }
+
+  /** Whether single events are shown, or only the days that have any. */
+  get showsEvents(): boolean {
+    return this.#scale.spanMs <= kMaxEventsSpanMs;
+  }
+
+  setLanes(lanes: readonly Lane[], onStage: readonly number[]): void {
+    this.#lanes = lanes;
+    this.#names.replaceChildren(
+      ...lanes.map(({ camera, name }) => {
+        const pressed = String(onStage.includes(camera));
+        const button = element("button", { type: "button", class: "lane-name", title: name, "aria-pressed": pressed }, name);
+        button.addEventListener("click", () => this.#actions.toggle(camera));
+        return button;
+      }),
+    );
+    this.#resize();
+  }
+
+  setKinds(kinds: ReadonlySet<EventKind>): void {
+    this.#kinds = kinds;
+    this.redraw();
+  }
+
+  /** Moves the playhead. When it leaves the span during playback, the timeline follows. */
+  setPlayhead(atMs: number | null, selected: FootageRef | null, isPlaying: boolean): void {
+    const was = this.#playheadMs;
+    this.#selected = selected;
+    this.#playheadMs = atMs;
+    if (atMs === null) return this.redraw();
+    const isLeaving = was !== null && this.#scale.contains(was) && !this.#scale.contains(atMs);
+    if (isPlaying && isLeaving && !this.#pointers.isPressed && !this.#isScrubbing) this.reveal(atMs);
+    this.#canvas.setAttribute("aria-valuenow", String(Math.round(atMs / 1000)));
+    this.#canvas.setAttribute("aria-valuetext", `${shortDate(atMs)} ${clockTime(atMs)}`);
+    this.redraw();
+  }
+
+  /** Moves so far that the time is in view. */
+  reveal(atMs: number): void {
+    if (this.#scale.contains(atMs)) return;
+    this.#show(this.#scale.panned((this.#scale.startMs - atMs) / this.#scale.msPerPx + this.#scale.widthPx * kAhead));
+  }
+
+  /** Shows the local day. */
+  showDay(dayMs: number): void {
+    this.#show(TimeScale.of(dayMs, midnight(dayMs, 1), this.#scale.widthPx));
+  }
+
+  showNow(): void {
+    const endMs = Date.now() + this.#scale.spanMs * kAhead;
+    this.#show(this.#scale.panned((this.#scale.endMs - endMs) / this.#scale.msPerPx));
+  }
+
+  /** A factor above 1 shows more time. */
+  zoom(factor: number, atPx = this.#zoomCentre()): void {
+    this.#show(this.#scale.zoomed(factor, atPx));
+  }
+
+  redraw(): void {
+    this.#animationFrame ||= requestAnimationFrame(() => {
+      this.#animationFrame = 0;
+      this.#draw();
+    });
+  }
+
+  close(): void {
+    this.#resized.disconnect();
+    cancelAnimationFrame(this.#animationFrame);
+  }
+
+  #zoomCentre(): number {
+    const x = this.#playheadMs === null ? NaN : this.#scale.xOf(this.#playheadMs);
+    return x >= 0 && x <= this.#scale.widthPx ? x : this.#scale.widthPx / 2;
+  }
+
+  #show(scale: TimeScale): void {
+    // Of the future there is nothing to see.
+    const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMaxAhead);
+    this.#scale = beyondMs > 0 ? scale.panned(beyondMs / scale.msPerPx) : scale;
+    this.#actions.moved();
+    this.redraw();
+  }
+
+  #resize(): void {
+    const widthPx = this.#drawn.clientWidth;
+    if (widthPx === 0) return;
+    this.root.style.setProperty("--lanes", String(Math.max(1, this.#lanes.length)));
+    // The newest stays in place: the right end does.
+    this.#scale = new TimeScale(this.#scale.endMs - widthPx * this.#scale.msPerPx, this.#scale.msPerPx, widthPx);
+    this.#colours = coloursOf(this.root);
+    this.#actions.moved();
+    this.redraw();
+  }
+
+  #draw(): void {
+    const colours = this.#colours;
+    if (!colours) return;
+    const scale = this.#scale;
+    const heightPx = this.#canvas.clientHeight;
+    const lanePx = heightPx / Math.max(1, this.#lanes.length);
+    const font = `${getComputedStyle(this.#names).fontSize} ${getComputedStyle(this.root).fontFamily}`;
+    const axis = prepare(this.#axis, scale.widthPx, kAxisPx);
+    const context = prepare(this.#canvas, scale.widthPx, heightPx);
+    paintAxis(axis, scale, colours, font);
+    paintGrid(context, scale, colours, heightPx, Date.now());
+    context.font = font;
+    this.#lanes.forEach(({ camera }, index) => {
+      const content = {
+        ...this.#contentOf(camera),
+        hasDay: this.showsEvents ? null : (day: number) => this.#days.has(camera, day),
+      };
+      paintLane(context, scale, colours, content, index * lanePx, lanePx, this.#selected);
+    });
+    if (this.#playheadMs === null) return;
+    const x = scale.xOf(this.#playheadMs);
+    paintPlayhead(context, x, heightPx, colours);
+    paintPlayhead(axis, x, kAxisPx, colours);
+  }
+
+  #contentOf(camera: number) {
+    if (!this.showsEvents) return { footage: [], segments: [] };
+    const { footage, segments } = this.#cache.get(camera, this.#scale.startMs / 1000, this.#scale.endMs / 1000);
+    return { segments, footage: footage.filter((one) => this.#kinds.has(kindOf(one))) };
+  }
+
+  #listenToScrubbing(): void {
+    const scrub = (event: PointerEvent) => this.#isScrubbing && this.#actions.scrub(this.#scale.msAt(event.offsetX));
+    this.#axis.addEventListener("pointerdown", (event) => {
+      if (event.button !== 0) return;
+      this.#axis.setPointerCapture(event.pointerId);
+      this.#isScrubbing = true;
+      scrub(event);
+    });
+    this.#axis.addEventListener("pointermove", scrub);
+    this.#axis.addEventListener("lostpointercapture", () => (this.#isScrubbing = false));
+  }
+
+  #click(event: MouseEvent): void {
+    const camera = this.#laneAt(event.offsetY);
+    if (camera === undefined || this.#pointers.hasMoved) return;
+    const { mark } = this.#footageAt(camera, event.offsetX);
+    if (mark) this.#actions.open(mark);
+    else this.#actions.seek(this.#scale.msAt(event.offsetX), camera);
+  }
+
+  #laneAt(y: number): number | undefined {
+    return this.#lanes[Math.floor((y / this.#canvas.clientHeight) * this.#lanes.length)]?.camera;
+  }
+
+  #footageAt(camera: number, x: number): { event: Footage | undefined; mark: Footage | undefined } {
+    const shown = this.#contentOf(camera).footage;
+    const [from, to, at] = [x - kMarkPx, x + kMarkPx, x].map((px) => this.#scale.msAt(px) / 1000) as [number, number, number];
+    return {
+      mark: shown.findLast(({ kind, moment }) => kind !== "event" && moment >= from && moment <= to),
+      event: shown.findLast(({ kind, start, stop }) => kind === "event" && start <= at && stop > at),
+    };
+  }
+
+  #showHint({ offsetX: x, offsetY: y, pointerType }: PointerEvent): void {
+    const camera = this.#laneAt(y);
+    if (camera === undefined || pointerType === "touch") return this.#hint.hide();
+    const atMs = this.#scale.msAt(x);
+    const { event, mark } = this.#footageAt(camera, x);
+    const about = mark ? mark.text : event ? `${duration(event.stop - event.start)} recorded` : "";
+    this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`);
+  }
+
+  #pressKey(event: KeyboardEvent): void {
+    if (event.altKey || event.ctrlKey || event.metaKey) return;
+    if (event.key === "+" || event.key === "=") this.zoom(1 / kKeyZoom);
+    else if (event.key === "-") this.zoom(kKeyZoom);
+    else if (event.key === "PageUp") this.#show(this.#scale.panned(this.#scale.widthPx / 2));
+    else if (event.key === "PageDown") this.#show(this.#scale.panned(-this.#scale.widthPx / 2));
+    else if (event.key === "Home") this.showDay(midnight(this.#playheadMs ?? this.#scale.startMs));
+    else if (event.key === "End") this.showNow();
+    else return;
+    event.preventDefault();
+    event.stopPropagation();
+  }
+}

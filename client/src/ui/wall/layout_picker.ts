@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The buttons that choose the wall's layout; the choice is kept for the next visit.
+
+import { iconButton } from "../widgets/button";
+import { element } from "../widgets/dom";
+import type { IconName } from "../widgets/icons";
+import { kLayoutChoices, type LayoutChoice } from "./layout";
+
+const kStorageKey = "lookhaven.layout";
+const kLabels: Record<LayoutChoice, [IconName, string]> = {
+  auto: ["layoutAuto", "All cameras on the screen"],
+  "1": ["layout1", "One camera"],
+  "2": ["layout2", "Two by two"],
+  "3": ["layout3", "Three by three"],
+};
+
+/** `onChoose` gets the choice of the last visit at once, and then each one that the user makes. */
+export function layoutPicker(onChoose: (choice: LayoutChoice) => void): HTMLElement {
+  const picker = element("div", { class: "segments", role: "group", "aria-label": "Layout" });
+  const choose = (choice: LayoutChoice) => {
+    onChoose(choice);
+    localStorage.setItem(kStorageKey, choice);
+    for (const button of picker.children) {
+      button.setAttribute("aria-pressed", String((button as HTMLElement).dataset["layout"] === choice));
+    }
+  };
+  for (const choice of kLayoutChoices) {
+    const button = iconButton(...kLabels[choice], () => choose(choice));
+    button.dataset["layout"] = choice;
+    picker.append(button);
+  }
+  const stored = localStorage.getItem(kStorageKey);
+  choose(kLayoutChoices.find((choice) => choice === stored) ?? "auto");
+  return picker;
+}

@@ -1,0 +1,100 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One camera on the wall: its picture, and below it a bar with state, name and snapshot button.
+
+import { SnapshotSource } from "../../live/snapshot_source";
+import { StreamSource } from "../../live/stream_source";
+import type { Unplayable } from "../../live/unplayable";
+import type { Semaphore } from "../../wire/semaphore";
+import type { Camera, Server } from "../../wire/server";
+import { LivePicture, type PictureState } from "../camera/live_picture";
+import { iconButton } from "../widgets/button";
+import { element, setText } from "../widgets/dom";
+import { signalText } from "../widgets/text";
+
+/** How a tile gets its pictures. */
+export type TileMode = "off" | "poll" | "stream-small" | "stream-full";
+
+export interface TileActions {
+  open(camera: Camera): void;
+  snapshot(camera: Camera): void;
+}
+
+export class Tile {
+  readonly root: HTMLElement;
+  readonly camera: Camera;
+  readonly picture: LivePicture;
+  readonly #open: HTMLButtonElement;
+  readonly #state = element("span", { class: "tile-state" });
+  readonly #stills: SnapshotSource;
+  readonly #streams: Record<Exclude<TileMode, "off" | "poll">, StreamSource>;
+
+  constructor(camera: Camera, server: Server, semaphore: Semaphore, actions: TileActions) {
+    this.camera = camera;
+    this.#stills = new SnapshotSource(server, camera, semaphore);
+    this.#streams = {
+      "stream-small": new StreamSource(server, camera, true, this.#stills),
+      "stream-full": new StreamSource(server, camera, false, this.#stills),
+    };
+    this.#open = element("button", { type: "button", class: "tile-open" });
+    this.picture = new LivePicture(
+      () => this.unplayable,
+      () => this.#showState(),
+      false,
+    );
+    this.#open.append(this.picture.root);
+    this.#open.addEventListener("click", () => actions.open(camera));
+    const bar = element(
+      "div",
+      { class: "tile-bar" },
+      element("span", { class: "dot" }),
+      element("span", { class: "tile-name", title: camera.name }, camera.name),
+      this.#state,
+      iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
+    );
+    this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, this.#open, bar);
+    this.picture.refresh();
+  }
+
+  set mode(mode: TileMode) {
+    if (mode === "off") this.picture.feed.stop();
+    else this.picture.feed.play(mode === "poll" ? this.#stills : this.#streams[mode]);
+    this.#showState();
+  }
+
+  /** Why the tile cannot play a stream; null when it plays one, or could. */
+  get unplayable(): Unplayable | null {
+    return this.#streams["stream-small"].unplayable ?? this.#streams["stream-full"].unplayable;
+  }
+
+  get isStreaming(): boolean {
+    return this.picture.feed.source?.pollIntervalMs === 0;
+  }
+
+  focus(): void {
+    this.#open.focus();
+  }
+
+  #showState(): void {
+    const state = this.picture.state();
+    this.root.dataset["state"] = state.kind;
+    const text = this.#stateText(state);
+    setText(this.#state, text);
+    this.#open.setAttribute("aria-label", `${this.camera.name}, ${text}: open large`);
+  }
+
+  /** Short, since the picture itself shows the whole sentence. */
+  #stateText(state: PictureState): string {
+    switch (state.kind) {
+      case "unavailable":
+        return "not available";
+      case "lost":
+        return "no signal";
+      case "live":
+      case "connecting":
+        return signalText(state, this.picture.feed.source?.pollIntervalMs);
+      case "idle":
+        return "";
+    }
+  }
+}

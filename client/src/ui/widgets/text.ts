@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Times, names and states as text for the user.
+
+import type { SignalState } from "../../live/signal_state";
+
+const two = (value: number) => String(value).padStart(2, "0");
+
+/** hh:mm:ss in the browser's time zone. */
+export function clockTime(unixMs: number): string {
+  const time = new Date(unixMs);
+  return [time.getHours(), time.getMinutes(), time.getSeconds()].map(two).join(":");
+}
+
+/** yyyy-mm-dd in the browser's time zone. */
+export function calendarDate(unixMs: number): string {
+  const time = new Date(unixMs);
+  return [time.getFullYear(), time.getMonth() + 1, time.getDate()].map(two).join("-");
+}
+
+const kDayAndMonth = new Intl.DateTimeFormat("en-GB", { weekday: "short", day: "numeric", month: "short" });
+const kMonthAndYear = new Intl.DateTimeFormat("en-GB", { month: "long", year: "numeric" });
+
+/** "Tue 24 Nov" in the browser's time zone. */
+export function shortDate(unixMs: number): string {
+  return kDayAndMonth.format(unixMs).replace(",", "");
+}
+
+/** "November 2026". */
+export function monthName(unixMs: number): string {
+  return kMonthAndYear.format(unixMs);
+}
+
+/** "4:05", "1:00:00". */
+export function duration(seconds: number): string {
+  const [hours, rest] = [Math.floor(seconds / 3600), Math.floor(seconds) % 3600];
+  const minutes = Math.floor(rest / 60);
+  return `${hours > 0 ? `${hours}:${two(minutes)}` : minutes}:${two(rest % 60)}`;
+}
+
+/** "½×" for slow motion by a factor of two, "4×" for four times as fast. */
+export function rateText(rate: number): string {
+  const slow: Record<number, string> = { [-2]: "½", [-4]: "¼", [-8]: "⅛" };
+  return `${slow[rate] ?? rate}×`;
+}
+
+/** A file name that every file system takes: the camera's name and the time, without characters that some refuse. */
+export function snapshotFileName(cameraName: string, takenMs: number): string {
+  const plain = cameraName
+    .replace(/[\u0000-\u001f\u007f/\\:*?"<>|]+/g, " ")
+    .trim()
+    .replace(/\s+/g, "-");
+  const name = plain.replace(/^[.-]+|[.-]+$/g, "") || "camera";
+  return `${name}_${calendarDate(takenMs)}_${clockTime(takenMs).replaceAll(":", "-")}.jpg`;
+}
+
+/** `pollIntervalMs` is the time between two pictures of a source that polls. */
+export function signalText(state: SignalState, pollIntervalMs = 0): string {
+  switch (state.kind) {
+    case "idle":
+      return "paused";
+    case "connecting":
+      return "connecting";
+    case "live":
+      return pollIntervalMs > 0 ? `live, every ${pollIntervalMs / 1000} s` : "live";
+    case "lost":
+      return `no signal since ${clockTime(state.sinceMs)}`;
+  }
+}

@@ -1,0 +1,101 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Audio without gaps, although it comes in bursts.
+
+import { JitterBuffer } from "../../../client/src/live/jitter_buffer";
+
+/** Plays pieces of 20 ms at 8 kHz, of which each sample is its own number; returns what `pull` gave, 10 ms at a time. */
+class Player {
+  readonly buffer: JitterBuffer;
+  #pushed = 0;
+
+  constructor(outputRate = 8000) {
+    this.buffer = new JitterBuffer(outputRate);
+  }
+
+  push(pieces: number, jumpMs = 0): void {
+    for (let piece = 0; piece < pieces; piece += 1, this.#pushed += 160) {
+      const samples = Float32Array.from({ length: 160 }, (_, index) => this.#pushed + index);
+      this.buffer.push({ timestampUs: this.#pushed * 125 + jumpMs * 1000, rate: 8000, channels: [samples] });
+    }
+  }
+
+  /** The stream times in ms at which each 10 ms began. */
+  pull(times: number): (number | null)[] {
+    return Array.from({ length: times }, () => {
+      const output = [new Float32Array(80), new Float32Array(80)];
+      const startUs = this.buffer.pull(output);
+      expect(output[1], "one channel is heard on both sides").toEqual(output[0]);
+      if (startUs === null) expect(output[0]!.every((sample) => sample === 0)).toBe(true);
+      return startUs === null ? null : startUs / 1000;
+    });
+  }
+}
+
+test("jitter: plays without a gap once enough is here, every sample once", () => {
+  const player = new Player();
+  player.push(5);
+  expect(player.pull(2)).toEqual([null, null]);
+  player.push(1);
+  const heard: number[] = [];
+  for (let turn = 0; turn < 50; turn += 1) {
+    const output = [new Float32Array(160)];
+    expect(player.buffer.pull(output)).toBe(turn * 20_000);
+    heard.push(...output[0]!);
+    player.push(1);
+  }
+  expect(heard).toEqual(heard.map((_, index) => index));
+});
+
+test("jitter: after running dry it gathers more than before", () => {
+  const player = new Player();
+  player.push(6);
+  expect(player.pull(14).map((at) => at !== null)).toEqual([...Array<boolean>(13).fill(true), false]);
+  player.push(7);
+  expect(player.pull(1)).toEqual([null]);
+  player.push(1);
+  expect(player.pull(1)).toEqual([120]);
+});
+
+test("jitter: of a burst the oldest is left out", () => {
+  const player = new Player();
+  player.push(6);
+  player.pull(1);
+  player.push(50);
+  expect(player.pull(1)[0]).toBeGreaterThanOrEqual(1120 - 120 - 250);
+});
+
+test("jitter: another stream's time empties it", () => {
+  const player = new Player();
+  player.push(6);
+  player.pull(1);
+  player.push(6, 60_000);
+  expect(player.pull(1)).toEqual([60_120]);
+});
+
+test("jitter: a device of twice the rate hears what lies between two samples, also of two pieces", () => {
+  const player = new Player(16_000);
+  player.push(6);
+  const output = [new Float32Array(1000)];
+  player.buffer.pull(output);
+  expect([...output[0]!]).toEqual(Array.from({ length: 1000 }, (_, index) => index / 2));
+});
+
+test("jitter: a clock that runs apart is followed, in both directions, without a gap", () => {
+  for (const push of [1.003, 0.997]) {
+    const player = new Player();
+    player.push(6);
+    player.pull(1);
+    let pushed = 6;
+    const delaysMs: number[] = [];
+    for (let turn = 1; turn <= 6000; turn += 1) {
+      const due = Math.floor(6 + push * turn * 0.5) - pushed;
+      player.push(due);
+      pushed += due;
+      const output = [new Float32Array(80)];
+      delaysMs.push(pushed * 20 - (player.buffer.pull(output) ?? NaN) / 1000);
+    }
+    expect(Math.min(...delaysMs)).toBeGreaterThan(0);
+    expect(Math.max(...delaysMs)).toBeLessThan(250);
+  }
+});

@@ -1,0 +1,177 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Recordings that a test makes up, played as the server plays them; answers requests of fetch, or of a web server.
+
+export interface Recorded {
+  id: number;
+  camera: number;
+  start: number;
+  stop: number;
+  frames: number;
+  kind?: "event" | "alert" | "pos";
+  reason?: number;
+  isGrowing?: boolean;
+  text?: string;
+}
+
+interface Stream {
+  key: number;
+  rate: number;
+  /** Ends it as another player does that takes the session. */
+  preempt(): void;
+}
+
+const kTailMs = 2_000;
+const kBoundary = "frame";
+const json = (data: unknown, status = 200) =>
+  new Response(JSON.stringify(status === 200 ? { success: true, data } : { success: false, error: { code: status } }), {
+    status,
+    headers: { "Content-Type": "application/json" },
+  });
+
+export class FakeArchive {
+  recorded: Recorded[] = [];
+  readonly streams: Stream[] = [];
+  /** Each stream that was asked for: event, where from, how far, rate. */
+  readonly asked: string[] = [];
+  playersPerSession = 1;
+  framesPerSecond = 100;
+  /** Frame `index` of a recording; without pictures a few bytes. */
+  picture: (index: number, camera: number) => Uint8Array = () => Uint8Array.of(255, 216);
+
+  readonly fetch = async (address: string, init: { signal?: AbortSignal; body?: unknown } = {}): Promise<Response> => {
+    const query = new URLSearchParams(address.slice(address.indexOf("?")));
+    for (const [name, value] of new URLSearchParams(String(init.body ?? ""))) query.set(name, value);
+    return this.answer(query, init.signal) ?? json(null, 404);
+  };
+
+  /** Undefined where it is not about recordings. */
+  answer(query: URLSearchParams, signal?: AbortSignal): Response | undefined {
+    const number = (name: string, otherwise = 0) => Number(query.get(name) ?? otherwise);
+    switch (`${query.get("api")} ${query.get("method")}`) {
+      case "VEXO.Lookhaven.Player EnumEvent":
+        return json({ camera: idsOf(query).map((camera) => this.#history(camera, number("from"), number("to"), number("interval", 5))) });
+      case "VEXO.Lookhaven.Player SearchAvaiDate":
+        return json({ search_time: number("start"), available_day: this.#days(query) });
+      case "VEXO.Event List":
+        return json({ event: idsOf(query).flatMap((camera) => this.#touching(camera, number("from"), number("to"), true).map(rawMark)) });
+      case "VEXO.Event Get": {
+        const kind = query.get("kind") ?? "event";
+        const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
+        return !one ? json(null, 404) : json(kind === "event" ? { ...rawEvent(one), camera_id: one.camera } : rawMark(one));
+      }
+      case "VEXO.Catalog Groups":
+        return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
+      case "VEXO.Playback SetRate": {
+        const stream = this.streams.find(({ key }) => key === number("timestamp"));
+        if (stream) stream.rate = number("rate");
+        return stream ? json(null) : json(null, 404);
+      }
+      case "VEXO.Lookhaven.Player PlayMjpegEvent":
+      case "VEXO.Lookhaven.Player PlayMjpegEventNoFrameId":
+        return this.#play(query, signal);
+      default:
+        return undefined;
+    }
+  }
+
+  #touching(camera: number, from: number, to: number, isMark: boolean): Recorded[] {
+    const isWanted = (one: Recorded) => one.camera === camera && (one.kind ?? "event") !== "event" === isMark;
+    return this.recorded.filter((one) => isWanted(one) && one.start < to && one.stop > from);
+  }
+
+  #history(camera: number, from: number, to: number, interval: number) {
+    const events = this.#touching(camera, from, to, false);
+    const steps = Array.from({ length: Math.ceil((to - from) / interval) }, (_, step) => {
+      const at = from + step * interval;
+      return events.some(({ start, stop }) => start < at + interval && stop > at) ? 2 : 0;
+    });
+    const runs: [number, number][] = [];
+    for (const value of steps) {
+      if (runs.at(-1)?.[0] === value) runs.at(-1)![1] += 1;
+      else runs.push([value, 1]);
+    }
+    return { camera_id: camera, event: events.map(rawEvent), event_map: { interval, runs }, total: events.length };
+  }
+
+  #days(query: URLSearchParams): number[] {
+    return Array.from({ length: Number(query.get("day_count")) }, (_, day) => {
+      const from = Number(query.get("start")) + day * 86_400;
+      return idsOf(query).some((camera) => this.#touching(camera, from, from + 86_400, false).length > 0) ? 1 : 0;
+    });
+  }
+
+  #play(query: URLSearchParams, signal?: AbortSignal): Response {
+    const number = (name: string, otherwise: number) => Number(query.get(name) ?? otherwise);
+    const kind = (["event", "alert", "pos"] as const)[number("recEvtType", 0)];
+    const found = this.recorded.find((one) => one.id === number("eventid", 0) && (one.kind ?? "event") === kind);
+    const duration = found ? (found.stop - found.start) * 1000 : 0;
+    const byTime = query.has("startTimeMS");
+    const from = byTime ? Math.floor((number("startTimeMS", 0) / duration) * (found?.frames ?? 0)) : number("framestart", 0);
+    const stop = byTime ? -1 : number("framestop", -1);
+    const rate = number("playrate", 1);
+    this.asked.push(`${kind}${number("eventid", 0)} ${byTime ? "time" : "frame"} ${byTime ? number("startTimeMS", 0) : from} to ${stop} at ${rate}`);
+    if (!found || from >= found.frames) return new Response("", { headers: { "Content-Type": "image/png" } });
+    return this.#stream(found, from, stop < from ? found.frames - 1 : stop, number("timestamp", 0), rate, byTime, signal);
+  }
+
+  #stream(found: Recorded, from: number, stop: number, key: number, rate: number, isSampled: boolean, signal?: AbortSignal) {
+    let timer: ReturnType<typeof setTimeout>;
+    const body = new ReadableStream<Uint8Array>({
+      start: (controller) => {
+        let index = from;
+        const end = () => {
+          clearTimeout(timer);
+          if (this.streams.includes(stream)) this.streams.splice(this.streams.indexOf(stream), 1);
+          signal?.removeEventListener("abort", leave);
+        };
+        const leave = () => {
+          end();
+          controller.error(new DOMException("left", "AbortError"));
+        };
+        const close = () => {
+          end();
+          controller.close();
+        };
+        const stream: Stream = { key, rate, preempt: close };
+        const send = () => {
+          // A browser that does not read holds the server back.
+          if ((controller.desiredSize ?? 0) > -20) {
+            controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
+            controller.enqueue(part("image/jpeg", this.picture(index, found.camera)));
+            index = Math.min(stop, index + Math.max(1, isSampled ? 1 : stream.rate));
+          }
+          timer = setTimeout(advance, (1000 / this.framesPerSecond) * Math.max(1, -stream.rate));
+        };
+        // At the end of what is still being recorded the server waits a while, and then ends the stream.
+        const advance = () => {
+          if (index < found.frames) send();
+          else timer = setTimeout(() => (index < found.frames ? send() : close()), kTailMs);
+        };
+        // A newer player of the session takes the place of the oldest.
+        if (this.streams.length >= this.playersPerSession) this.streams[0]!.preempt();
+        this.streams.push(stream);
+        signal?.addEventListener("abort", leave);
+        send();
+      },
+    });
+    return new Response(body, { headers: { "Content-Type": `multipart/x-mixed-replace; boundary=${kBoundary}` } });
+  }
+}
+
+function idsOf(query: URLSearchParams): number[] {
+  return (query.get("cameralists") ?? "").split(",").map(Number);
+}
+
+function rawEvent({ id, start, stop, frames, reason = 1, isGrowing = false }: Recorded) {
+  return { id, start, stop, frame_count: frames, record_type: reason, is_recording: isGrowing };
+}
+
+function rawMark({ id, kind, camera, start, stop, text = "" }: Recorded) {
+  return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", text: text.split("\n") };
+}
+
+function part(type: string, body: Uint8Array): Uint8Array {
+  const head = Buffer.from(`--${kBoundary}\r\nContent-Type: ${type}\r\nContent-Length: ${body.length}\r\n\r\n`);
+  return Buffer.concat([head, body, Buffer.from("\r\n")]);
+}

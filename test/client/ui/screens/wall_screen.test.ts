@@ -1,0 +1,200 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The built client in a real browser: which connections it holds, what it says of a silent camera, keyboard and phone.
+
+import { execFileSync } from "node:child_process";
+import { hasBrowser, type Page } from "../../support/browser";
+import { ServedClient, smallControls } from "../../support/served_client";
+
+/** Pictures of H.264 that are white for the first four of each 25, else black. */
+function flashes(): Buffer[] {
+  const source = "color=black:s=320x180:r=25:d=2,drawbox=color=white:t=fill:enable='lt(mod(n\\,25)\\,4)'";
+  const encode = ["-c:v", "libx264", "-preset", "ultrafast", "-bf", "0", "-g", "25", "-x264-params", "aud=1"];
+  const video = execFileSync("ffmpeg", ["-v", "error", "-f", "lavfi", "-i", source, ...encode, "-f", "h264", "-"]);
+  const delimiter = Buffer.from([0, 0, 0, 1, 9]);
+  const starts: number[] = [];
+  for (let at = 0; at >= 0; at = video.indexOf(delimiter, at + 1)) starts.push(at);
+  return starts.map((start, index) => video.subarray(start, starts[index + 1]));
+}
+
+describe.skipIf(!hasBrowser)("in Chromium", () => {
+  const client = new ServedClient();
+  const { server } = client;
+
+  beforeAll(() => {
+    server.muxed.set(12, { type: "H264", pictures: flashes(), isLoud: (number) => number % 25 < 4 });
+    const unplayable = Buffer.from("0000000142010101600000030090000003000003003fa0050201000000012601af", "hex");
+    server.muxed.set(13, { type: "H265", pictures: [unplayable], isLoud: () => false });
+  });
+
+  async function loggedIn(cameras: number | number[], widthPx = 1440, heightPx = 900, from = client.address): Promise<Page> {
+    server.hasSession = false;
+    server.stalled.clear();
+    server.cameras.length = 0;
+    for (const id of typeof cameras === "number" ? Array.from({ length: cameras }, (_, index) => index + 1) : cameras)
+      server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: server.muxed.has(id) ? 3 : 1 });
+    const page = await client.open(from, widthPx, heightPx);
+    await page.run(() => document.querySelectorAll("input").forEach((input) => (input.value = "x")));
+    await page.press("Enter");
+    await page.until(() => document.querySelector(".tile[data-state=live]") !== null);
+    return page;
+  }
+
+  const open = (streams: string[]) => vi.waitFor(() => expect([...server.streams].sort()).toEqual(streams), 5000);
+
+  test("four tiles stream and the others poll in turns; what is not seen has no connection", async () => {
+    const page = await loggedIn(9);
+    await open(["1/1", "2/1", "3/1", "4/1"]);
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 9);
+    await vi.waitFor(() => expect(server.polls).toBeGreaterThan(7), 5000);
+    expect(server.mostPollsAtOnce).toBe(1);
+    await page.click("[data-camera='3'] .tile-open");
+    await open(["3/usual"]);
+    await page.press("Escape");
+    await open(["1/1", "2/1", "3/1", "4/1"]);
+    await page.click("[data-layout='2']");
+    await page.run(() => document.querySelector(".grid")!.scrollTo(0, 1e6));
+    await open(["7/1", "8/1", "9/1"]);
+    await page.run(() => {
+      Object.defineProperty(document, "hidden", { value: true });
+      document.dispatchEvent(new Event("visibilitychange"));
+    });
+    await open([]);
+    await client.leave(page);
+  }, 40_000);
+
+  test("a silent camera is told from a live one, and comes back", async () => {
+    const page = await loggedIn(3);
+    await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
+    server.stalled.add(3);
+    await page.until(() =>
+      /^No signal since \d\d:\d\d:\d\d$/.test(document.querySelector("[data-camera='3'] .message-sentence")!.textContent!),
+    );
+    expect(await page.run(() => document.querySelector(".bar-status")!.textContent)).toBe("3 cameras · 1 without signal");
+    expect(await page.run(() => document.querySelector("[data-camera='1']")!.getAttribute("data-state"))).toBe("live");
+    server.stalled.clear();
+    await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
+    await client.leave(page);
+  }, 40_000);
+
+  test("all can be done with keys; a snapshot opens over the picture and closes without leaving it", async () => {
+    const page = await loggedIn(4);
+    await page.run(() => document.querySelector<HTMLElement>("[data-camera='1'] .tile-open")!.focus());
+    await page.press("ArrowDown");
+    await page.press("Enter");
+    const shown = () => document.querySelector(".large-name")?.textContent ?? "";
+    await vi.waitFor(async () => expect(await page.run(shown)).toBe("Camera <b>3</b>"));
+    await page.press("s");
+    await page.until(() => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false);
+    await page.press("Escape");
+    await page.until(() => !document.querySelector("dialog")!.open);
+    await page.press("ArrowLeft");
+    expect(await page.run(shown)).toBe("Camera <b>2</b>");
+    await page.until(() => document.querySelector(".large[data-state=live]") !== null);
+    await page.press("Escape");
+    await page.until(() => document.activeElement?.closest(".tile")?.getAttribute("data-camera") === "2");
+    await client.leave(page);
+  }, 40_000);
+
+  test("all kinds of cameras side by side; sound on demand, and the picture in step with it", async () => {
+    const page = await loggedIn([13, 1, 2, 3, 12]);
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 5);
+    // The camera that cannot be played has left its stream to the last one.
+    await open(["1/1", "12/usual", "2/1", "3/1"]);
+    const hints = await page.run(() => [...document.querySelectorAll(".hint")].map((hint) => hint.textContent));
+    expect(hints).toEqual(["This browser cannot play H.265: still pictures", "", "", "", ""]);
+    await page.run(watchSoundAndPicture);
+    await page.click("[data-camera='12'] .tile-open");
+    await page.until(() => / (2[0-9]) fps$/.test(document.querySelector(".large-description")!.textContent!));
+    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
+    expect(await page.run(() => document.body.dataset["sounds"]), "muted at first").toBe("");
+    await page.press("m");
+    await page.until(() => document.body.dataset["sounds"]!.split(" ").length >= 6);
+    expect(await page.run(() => document.querySelector(".sound")!.textContent)).toBe("Sound on");
+    const { sounds, pictures } = (await page.run(() => ({ ...document.body.dataset }))) as Record<string, string>;
+    const seenMs = pictures!.split(" ").map(Number);
+    // Of the first second, in which the picture begins to wait for the sound, nothing is asked.
+    const offsetsMs = sounds!
+      .split(" ")
+      .slice(2)
+      .map((heard) => Math.min(...seenMs.map((seen) => Math.abs(seen - Number(heard)))));
+    expect(Math.max(...offsetsMs.sort((one, other) => one - other).slice(0, -1))).toBeLessThanOrEqual(80);
+    await page.press("m");
+    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
+    await client.leave(page);
+  }, 40_000);
+
+  test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
+    const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
+    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 2);
+    await open(["1/1"]);
+    const link = (where: string) => document.querySelector<HTMLAnchorElement>(`${where} a`)?.href;
+    expect(await page.run(link, ".wall-advice")).toBe("https://lan.test:8443/");
+    await page.click("[data-camera='12'] .tile-open");
+    await page.until(() => document.querySelector(".large-state")!.textContent === "live, every 2 s");
+    expect(await page.run(link, ".large .hint")).toBe("https://lan.test:8443/#camera=12");
+    await client.leave(page);
+  }, 40_000);
+
+  test("logging out and a session that ends both lead to the login, with every stream closed", async () => {
+    const page = await loggedIn(4);
+    await page.click("[aria-label='Log out admin']");
+    await page.until(() => document.querySelector(".login") !== null);
+    await open([]);
+    await page.send("Page.close", {});
+    const other = await loggedIn(4);
+    server.hasSession = false;
+    await other.until(() => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.");
+    await client.leave(other);
+  }, 40_000);
+
+  test("a phone shows one column, and nothing too small for a finger", async () => {
+    const page = await loggedIn(4, 390, 844);
+    const columns = () =>
+      new Set([...document.querySelectorAll(".tile")].map((tile) => tile.getBoundingClientRect().left)).size;
+    expect(await page.run(columns)).toBe(1);
+    expect(await page.run(smallControls, "button, a")).toEqual([]);
+    await page.click(".tile-open");
+    await page.until(() => document.querySelector(".large[data-state=live]") !== null);
+    expect(await page.run(smallControls, "button, a")).toEqual([]);
+    expect(await page.run(() => document.documentElement.scrollWidth)).toBe(390);
+    await client.leave(page);
+  }, 40_000);
+});
+
+/** Runs in the page: notes in its body when a sound begins to be heard, and when the large picture turns white. */
+function watchSoundAndPicture(): void {
+  const notes = Object.assign(document.body.dataset, { sounds: "", pictures: "" });
+  const note = (what: "sounds" | "pictures", ms: number) => (notes[what] = `${notes[what]} ${ms}`.trim());
+  const connect = AudioNode.prototype.connect as (to: AudioNode) => AudioNode;
+  AudioNode.prototype.connect = function (this: AudioNode, to: AudioNode) {
+    const context = this.context as AudioContext;
+    const ear = context.createAnalyser();
+    const samples = new Float32Array(ear.fftSize);
+    let lastLoud = 0;
+    setInterval(() => {
+      const endTime = context.currentTime;
+      ear.getFloatTimeDomainData(samples);
+      samples.forEach((sample, index) => {
+        const atTime = endTime - (samples.length - index) / context.sampleRate;
+        if (Math.abs(sample) < 0.05 || atTime <= lastLoud) return;
+        const { contextTime, performanceTime } = context.getOutputTimestamp();
+        if (atTime - lastLoud > 0.5) note("sounds", performanceTime! + (atTime - contextTime!) * 1000);
+        lastLoud = atTime;
+      });
+    }, 20);
+    connect.call(this, ear);
+    return connect.call(this, to);
+  } as typeof AudioNode.prototype.connect;
+  const eye = new OffscreenCanvas(1, 1).getContext("2d", { willReadFrequently: true })!;
+  let wasWhite = false;
+  const look = () => {
+    const canvas = document.querySelector<HTMLCanvasElement>(".large canvas");
+    if (canvas) eye.drawImage(canvas, 5, 5, 1, 1, 0, 0, 1, 1);
+    const isWhite = eye.getImageData(0, 0, 1, 1).data[0]! > 128;
+    if (isWhite && !wasWhite) note("pictures", performance.now());
+    wasWhite = isWhite;
+    requestAnimationFrame(look);
+  };
+  look();
+}
