@@ -8,20 +8,31 @@
 
 #include "platform/export.h"
 
-// A stream profile of a camera; -1 is used on the wire for "the camera's own choice".
+// A stream profile of a camera, 0 … CAM_PROFILE_COUNT - 1; -1 is used on the wire for "the camera's own choice".
 enum CAM_PROFILE_TYPE : int {
     CAM_PROFILE_DEFAULT = -1,
     CAM_PROFILE_HIGH = 0,
     CAM_PROFILE_LOW = 1,
-    CAM_PROFILE_MOBILE = 2,
 };
 
-// How a camera codes its video. Only MJPEG matters to the module.
+// The codec of a camera's video. The module itself only tells MJPEG from the rest; the numbers go to clients.
 enum CAM_VIDEO_TYPE : int {
     CAM_VIDEO_MJPEG = 1,
-    CAM_VIDEO_MPEG4 = 2,
     CAM_VIDEO_H264 = 3,
     CAM_VIDEO_H265 = 6,
+};
+
+// Whether a camera has sound. The codec is named by each stream, since a camera may change it.
+enum CAM_AUDIO_TYPE : int {
+    CAM_AUDIO_NONE = 0,
+    CAM_AUDIO_SUPPORTED = 1,
+};
+
+// The kind of camera.
+enum CAM_DEVICE_TYPE : int {
+    CAM_DEVICE_UNKNOWN = 0,
+    CAM_DEVICE_FIXED = 1,
+    CAM_DEVICE_PTZ = 2,
 };
 
 constexpr int CAM_NAME_SIZE = 256;
@@ -51,11 +62,8 @@ class LH_PLATFORM_API Camera {
     int m_VideoType;    // CAM_VIDEO_TYPE of the live stream
     int m_LiveProfile;  // CAM_PROFILE_TYPE
     int m_StreamNo[CAM_PROFILE_COUNT];
-    bool m_blPtz;    // the camera moves
-    bool m_blAudio;  // the camera hears
-    std::string m_StoragePath;
-    int m_AudioType = 0;         // how the camera codes its sound, as the recorder numbers it; 0: none, or unknown
-    int m_DeviceType = 0;        // the recorder's number for the kind of device
+    int m_AudioType;             // CAM_AUDIO_TYPE
+    int m_DeviceType;            // CAM_DEVICE_TYPE
     std::string m_OwnerDevName;  // the recording server that owns the camera; empty for this host's own
 };
 

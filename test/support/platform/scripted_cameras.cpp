@@ -42,8 +42,8 @@ Camera::Camera()
       m_VideoType(0),
       m_LiveProfile(0),
       m_StreamNo{},
-      m_blPtz(false),
-      m_blAudio(false) {}
+      m_AudioType(CAM_AUDIO_NONE),
+      m_DeviceType(CAM_DEVICE_UNKNOWN) {}
 int Camera::Load(int camId, int serverId, int archiveId) {
     Call("Load", camId, serverId, archiveId);
     const auto found = Script().cameras.find(camId);
