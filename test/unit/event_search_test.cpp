@@ -10,13 +10,8 @@
 #include "player/multiplayer/time_zone_keys.h"
 #include "test/support/platform/scripted_platform.h"
 
-using lookhaven::test::Calls;
-using lookhaven::test::MakeCamera;
-using lookhaven::test::MakeEvent;
-using lookhaven::test::operator+;
-using lookhaven::test::ScriptedPlatform;
+using namespace lookhaven::test;
 using testing::ElementsAre;
-using Script = std::function<void(ScriptedPlatform&)>;
 
 namespace {
 
@@ -26,7 +21,7 @@ constexpr int kDay = 86400;
 struct Search {
     explicit Search(const char* method) {
         platform.method = method;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = LOG_LEVEL_ERR;
+        platform.log_cfg.m_CategLevel[68] = 1;
         platform.denied_cameras = {12, 9};
         platform.denied_groups = {6};
         for (const int id : {2, 4}) {
@@ -158,7 +153,7 @@ TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
 
 struct TurnedAwayRow {
     const char* name;
-    Script before;
+    Change before;
     std::string log;   // "" for none
     int code;          // 0: success
     const char* last;  // call before the answer
@@ -167,7 +162,8 @@ struct TurnedAwayRow {
 TEST(EventSearch, TurnsAway) {
     const std::string uid = "Failed to load priv profile of Uid[7].\n", span = "Error time duration.\n";
     const TurnedAwayRow both[] = {
-        {"no profile", [](auto& p) { p.profile_id = 0; }, uid, 401, "PrivProfileGetByUid"},
+        {"no profile, and a forbidden group", [](auto& p) { p.profile_id = 0, p.params["camGrpId"] = 6; }, uid, 401,
+         "PrivProfileGetByUid"},
         {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, "PrivProfileGetByUid"},
         {"forbidden group", [](auto& p) { p.params["camGrpId"] = 6; }, "Inaccessible camera group[6].\n", 401,
          "GetInaPrivPerCamGrpIdSet"},
@@ -175,8 +171,9 @@ TEST(EventSearch, TurnsAway) {
          "Inaccessible camera group[6].\n", 401, "GetInaPrivPerCamGrpIdSet"},
         {"unknown group", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = 1; },
          "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
-        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 0; }, "", 401,
-         "PrivProfileGetByUid"},
+        {"a group that fails", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = -1; },
+         "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
+        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[68] = 0; }, "", 401, "PrivProfileGetByUid"},
     };
     const auto from_to = [](int from, int to) {
         return [=](ScriptedPlatform& p) { p.params["from"] = from, p.params["to"] = to; };
@@ -202,6 +199,7 @@ TEST(EventSearch, TurnsAway) {
         if (!logs.empty()) {
             EXPECT_EQ(logs[0].text, row.log);
             EXPECT_EQ(logs[0].file + " " + logs[0].func, std::string("multiplayer Handle") + method);
+            EXPECT_EQ(logs[0].categ + logs[0].level, "player1");
         }
         const auto calls = search.All("");
         EXPECT_THAT(calls.at(calls.size() - 2 - logs.size()), testing::StartsWith(row.last));
@@ -221,23 +219,23 @@ TEST(EventSearch, TurnsAway) {
 TEST(EventSearch, AGroupDecidesAloneWhichCamerasItHas) {
     for (const char* method : {"SearchAvaiDate", "EnumEvent"}) {
         Search search(method);
-        search.platform.params["camGrpId"] = 1;
-        search.platform.params["cameralists"] = "12,2";
+        Params({{"camGrpId", 1}, {"mount_id", 3}, {"cameralists", "12,2"}})(search.platform);
         search.Run();
         EXPECT_EQ(search.platform.CallsFrom("CamGroup::Load").at(1), "GetCamMap(1)");
         ASSERT_EQ(search.All("EventListGetAll").size(), 1U) << "a denied camera of the group, none outside it";
-        EXPECT_THAT(search.All("EventListGetAll")[0], testing::HasSubstr(",12,"));
+        EXPECT_THAT(search.All("EventListGetAll")[0],
+                    testing::AllOf(testing::StartsWith("EventListGetAll(3,"), testing::HasSubstr(",12,")));
     }
 }
 
 TEST(EventSearch, TracesTheRequestAtLevel5) {
     for (const int level : {4, 5}) {
         Search search("Other");
-        search.platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = level;
+        search.platform.log_cfg.m_CategLevel[68] = level;
         search.platform.params[""]["a"] = 1;
         search.Run();
         EXPECT_EQ(search.All("log"),
-                  (level == 4 ? Calls{} : Calls{"log Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
+                  (level == 4 ? Calls{} : Calls{"log player/5 Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
         EXPECT_EQ(search.All("").size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
     }
 }
@@ -258,29 +256,40 @@ TEST(EnumEvent, AsksInOrder) {
 }
 
 TEST(EnumEvent, DescribesEachEvent) {
-    Search search("EnumEvent");
-    Event event = MakeEvent(31, 1000001, 1000002, 7);
-    event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
-    event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
-    search.platform.found_events = {event};
-    search.platform.muted_cameras = {4};
-    search.platform.mount_cameras[0] = MakeCamera(0, 1);
-    search.platform.rec_log_result = 1;
-    search.platform.params["recording"] = true;
-    search.platform.params["cameralists"] = "4,1,9,0,2,2";
-    search.Run();
-    const auto entry = [](const char* audio, const char* id) {
-        return std::string("{\"camera_id\":") + id + ",\"event\":[{\"archived\":false,\"audio_format\":\"" + audio +
-               "\",\"event_size\":1.5,\"fisheye_origin_view\":true,\"frameCount\":33,\"frame_count\":33,\"id\":31,"
-               "\"id_on_RecServer\":1031,\"img_height\":360,\"img_width\":640,\"is_recording\":true,"
-               "\"name\":\"2/x.mkv\",\"record_type\":7,\"start\":1000001,\"startTime\":1000001,\"stop\":1000002,"
-               "\"stopTime\":1000002,\"video_type\":3}],\"total\":1}";
-    };
-    EXPECT_EQ(search.platform.calls.back(),
-              "SetSuccess({\"camera\":[" + entry("", "4") + "," + entry("AAC", "2") + "," + entry("AAC", "2") + "]})");
-    EXPECT_THAT(search.All("EventListGetAll"), ElementsAre("EventListGetAll(0,-1,1000000,1000060,4,0,0,6,camera_id)",
-                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)",
-                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)"));
+    for (const int rec_log_result : {1, -1}) {
+        Search search("EnumEvent");
+        Event event = MakeEvent(31, 1000001, 1000002, 7);
+        event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
+        event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
+        search.platform.found_events = {event, event};
+        Event& other = search.platform.found_events.back();
+        other.m_CamId = 2, other.m_blArchived = true, other.m_blRecording = false, other.m_Size = 1ULL << 43;
+        search.platform.muted_cameras = {4};
+        search.platform.mount_cameras[0] = MakeCamera(0, 1);
+        search.platform.mount_cameras[1] = MakeCamera(1, CAM_VIDEO_MJPEG);
+        search.platform.rec_log_result = rec_log_result;
+        Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search.platform);
+        search.Run();
+        const auto entry = [](const std::string& audio, const std::string& id) {
+            const auto one = [&](const char* archived, const char* size, const char* fisheye, const char* recording) {
+                return std::string("{\"archived\":") + archived + ",\"audio_format\":\"" + audio +
+                       "\",\"event_size\":" + size + ",\"fisheye_origin_view\":" + fisheye +
+                       ",\"frameCount\":33,\"frame_count\":33,\"id\":31,\"id_on_RecServer\":1031,\"img_height\":360,"
+                       "\"img_width\":640,\"is_recording\":" +
+                       recording +
+                       ",\"name\":\"2/x.mkv\",\"record_type\":7,\"start\":1000001,\"startTime\":1000001,"
+                       "\"stop\":1000002,\"stopTime\":1000002,\"video_type\":3}";
+            };
+            return "{\"camera_id\":" + id + ",\"event\":[" + one("false", "1.5", "true", "true") + "," +
+                   one("true", "8388608.0", "false", "false") + "],\"total\":2}";
+        };
+        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"camera\":[" + entry("", "4") + "," + entry("AAC", "1") +
+                                                    "," + entry("AAC", "2") + "," + entry("AAC", "2") + "]})");
+        const auto query = [](const std::string& rest) { return "EventListGetAll(0,-1,1000000,1000060," + rest; };
+        EXPECT_THAT(search.All("EventListGetAll"),
+                    ElementsAre(query("4,0,0,6,camera_id)"), query("1,0,0,1,camera_id)"), query("2,0,0,6,camera_id)"),
+                                query("2,0,0,6,camera_id)")));
+    }
 }
 
 TEST(EnumEvent, OfNoCameraIsAnEmptyList) {
@@ -317,7 +326,8 @@ TEST(EnumEvent, MarksCoverage) {
          100,
          110,
          {MakeEvent(1, 100, 101, 0), MakeEvent(1, 101, 102, 7), MakeEvent(1, 102, 103, 9), MakeEvent(1, 103, 104, 11),
-          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1)},
+          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1), MakeEvent(1, 106, 107, 8),
+          MakeEvent(1, 107, 108, 266)},
          ".........."},
         {"from the lowest to the highest time", 100, 110, {MakeEvent(1, INT_MIN, INT_MAX)}, ".........."},
         {"over the wrap of time", INT_MAX - 4, INT_MAX, {MakeEvent(1, INT_MAX - 2, INT_MIN)}, "..XX"},

@@ -7,16 +7,13 @@
 #include "player/liveview/liveview.h"
 #include "test/support/platform/scripted_platform.h"
 
-using lookhaven::test::MakeCamera;
-using lookhaven::test::ScriptedPlatform;
-using lookhaven::test::Sound;
+using namespace lookhaven::test;
 using testing::ElementsAre;
 using testing::IsEmpty;
-using Script = std::function<void(ScriptedPlatform&)>;
 
 namespace {
 
-void Load(ScriptedPlatform& platform, const Script& script) {
+void Load(ScriptedPlatform& platform, const Change& script) {
     platform.method = "LoadCamera";
     platform.camera_list = {MakeCamera(2, CAM_VIDEO_H264), MakeCamera(3, CAM_VIDEO_MJPEG, false),
                             MakeCamera(4, CAM_VIDEO_MJPEG), MakeCamera(6, CAM_VIDEO_MJPEG)};
@@ -42,7 +39,7 @@ TEST(LoadCamera, AsksInOrderAndOnlyForEnabledCameras) {
 
 struct AnswerRow {
     const char* name;
-    Script script;
+    Change script;
     std::string answer;
 };
 
@@ -85,7 +82,7 @@ TEST(LoadCamera, SelectsNoneWhenNoneIsMjpeg) {
 
 struct FailureRow {
     const char* name;
-    Script script;
+    Change script;
     std::vector<std::string> logs;  // source:line function: text
     bool answered;
 };
@@ -94,12 +91,12 @@ TEST(LoadCamera, FailuresAreLoggedAndOnlyABrokenFunctorIsForgiven) {
     const std::string failed = "liveview:96 HandleLiveviewLoad: Failed to sent camera data.\n";
     const std::string functor = "interface/handlerutils:";
     const FailureRow rows[] = {
-        {"unknown user",
-         [](auto& p) { p.profile_id = 0; },
+        {"unknown user, and no port",
+         [](auto& p) { p.profile_id = p.login_port = 0; },
          {"liveview:24 SendCamerasData: Incorrect priv profile of Uid[7].\n", failed},
          false},
-        {"no port",
-         [](auto& p) { p.login_port = 0; },
+        {"no port, nor capabilities",
+         [](auto& p) { p.login_port = 0, p.cap_failures = {2}; },
          {"liveview:36 SendCamerasData: Failed to get direct login port.\n", failed},
          false},
         {"negative port",

@@ -16,13 +16,23 @@ namespace {
 struct FramesRow {
     const char* name;
     const char* method;
-    Script before;
-    std::map<int, Script> plan;
+    Change before;
+    std::map<int, Change> plan;
     std::string frames;  // the stream is stopped at the fifth picture unless it ends before
 };
 
+const Change kGrown = [](auto& p) { p.frame_count = 2, p.grown_by = 9; };
+const Change kBroken = [](auto& p) { p.write_result = -1, p.flush_fails = true; };
+
 const FramesRow kFrames[] = {
     {"the last stands", kByIndex, Frames(3), {}, "0:P0 1:P1 2:P2 2:P2 2:P2 "},
+    {"lowest ids",
+     kByIndex,
+     Params({{"eventid", 1}, {"timestamp", 1}}) + [](auto& p) { p.events[1] = p.events[3]; },
+     {},
+     "0:P0 1:P1 2:P2 3:P3 4:P4 "},
+    {"start past the last frame of the count", kByIndex, Params({{"framestart", 5}}) + kGrown, {}, ""},
+    {"broken output", kByIndex, kBroken, {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
     {"rate 4", kByIndex, Frames(10) + Params({{"playrate", 4}}), {}, "0:P0 4:P4 8:P8 9:P9 9:P9 "},
     {"rate -2", kByIndex, Params({{"playrate", -2}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
     {"rate 0", kByIndex, Params({{"playrate", 0}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
@@ -54,6 +64,13 @@ const FramesRow kFrames[] = {
     {"lowest interval", kByIndex, Params({{"interval", INT_MIN}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
     {"highest frame rate", kByIndex, Params({{"interval", 2}}) + [](auto& p) { p.frame_rate = 1e30F; }, {}, "0:P0 "},
 
+    {"lowest ids",
+     kByTime,
+     Params({{"eventid", 1}, {"timestamp", 1}}) + [](auto& p) { p.events[1] = p.events[3]; },
+     {},
+     "P0 P0 P1 P2 P3 "},
+    {"start past the last frame of the count", kByTime, Params({{"startTimeMS", 50}}) + kGrown, {}, ""},
+    {"broken output", kByTime, kBroken, {}, "P0 P0 P1 P2 P3 "},
     {"to the end", kByTime, Frames(4), {}, "P0 P0 P1 P2 "},
     {"given stop", kByTime, Params({{"startTimeMS", 15}, {"stopTimeMS", 39}}), {}, "P1 P1 P2 "},
     {"one frame", kByTime, Params({{"startTimeMS", 20}, {"stopTimeMS", 25}}), {}, "P2 "},

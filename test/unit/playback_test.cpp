@@ -10,6 +10,19 @@ using namespace lookhaven::test;
 
 namespace {
 
+const int kFlagsAtLoad = g_PlayerStop + g_PlayerCheckPid + g_PlayerPause;
+
+TEST(Playback, SignalsSetTheFlags) {
+    EXPECT_EQ(kFlagsAtLoad, 0);
+    const Player player(kByIndex);
+    ASSERT_TRUE(SetupPlayerSignals());
+    for (const int pause : {1, 0, 1}) {
+        std::raise(SIGUSR2);
+        EXPECT_EQ(g_PlayerPause, pause);
+    }
+    EXPECT_EQ(g_PlayerStop + g_PlayerCheckPid, 0);
+}
+
 TEST(Playback, ReadsAndCallsInOrder) {
     struct Row {
         const char* method;
@@ -47,9 +60,9 @@ struct Outcome {
 
 struct FailureRow {
     const char* name;
-    Script before;
+    Change before;
     Outcome by_index, by_time;
-    Script at_first_picture = Nothing;
+    Change at_first_picture = Nothing;
 };
 
 TEST(Playback, FailuresHaveTheirAnswers) {
@@ -60,7 +73,8 @@ TEST(Playback, FailuresHaveTheirAnswers) {
     const Outcome no_session = {"Failed to get session ID.\n", "400", true};
     const Outcome no_pid_file = {"Failed to write pid file.\n", "400", true};
     const FailureRow rows[] = {
-        {"event 0", Params({{"eventid", 0}}), bad, forgiven},
+        {"event 0, nor a signal", Params({{"eventid", 0}}) + [](auto& p) { p.failing_signals = {SIGTERM}; }, bad,
+         forgiven},
         {"start before the begin", Params({{"framestart", -1}, {"startTimeMS", -1}}), bad, forgiven},
         {"start beyond 31 bits", Params({{"framestart", INT_MIN}, {"startTimeMS", Json::Int64{1} << 31}}), bad,
          forgiven},
@@ -68,9 +82,11 @@ TEST(Playback, FailuresHaveTheirAnswers) {
         {"negative stream key", Params({{"timestamp", -5}}), bad, forgiven},
         {"SIGTERM", [](auto& p) { p.failing_signals = {SIGTERM}; }, signals, signals},
         {"SIGUSR1", [](auto& p) { p.failing_signals = {SIGUSR1}; }, signals, signals},
-        {"SIGUSR2", [](auto& p) { p.failing_signals = {SIGUSR2}; }, signals, signals},
-        {"no session", [](auto& p) { p.session_id = ""; }, no_session, no_session},
-        {"no place for a pid file", [](auto& p) { p.session_id = kSession + "/x"; }, no_pid_file, no_pid_file},
+        {"SIGUSR2, nor a session", [](auto& p) { p.failing_signals = {SIGUSR2}, p.session_id = ""; }, signals, signals},
+        {"no session, nor an event", [](auto& p) { p.session_id = "", p.events.clear(); }, no_session, no_session},
+        {"no place for a pid file, nor an event to flush",
+         [](auto& p) { p.session_id = kSession + "/x", p.events.clear(), p.params["flushHeader"] = 1; }, no_pid_file,
+         no_pid_file},
         {"unknown event",
          [](auto& p) { p.events.clear(); },
          {unknown, "ok", true},
@@ -81,8 +97,8 @@ TEST(Playback, FailuresHaveTheirAnswers) {
          {unknown, "400", false, std::to_string(getpid())}},
         {"nothing saved", [](auto& p) { p.events[3].m_blSaved = false; }, silent, not_played},
         {"no file", [](auto& p) { p.has_file = false; }, silent, not_played},
-        {"no recording", [](auto& p) { p.init_result = 1; }, silent, not_played},
-        {"no frame information", [](auto& p) { p.frame_info_result = 1; }, silent, not_played},
+        {"no recording", [](auto& p) { p.init_result = -1; }, silent, not_played},
+        {"no frame information", [](auto& p) { p.frame_info_result = -1; }, silent, not_played},
         {"frame rate 0", [](auto& p) { p.frame_rate = 0; }, silent, not_played},
         {"no memory",
          [](auto& p) { p.has_memory = false; },
@@ -104,7 +120,7 @@ TEST(Playback, FailuresHaveTheirAnswers) {
             EXPECT_EQ(player.Run({{1, row.at_first_picture}}, 2), expected.redirect ? kRedirect : "");
             std::string text;
             for (const auto& log : player.platform.logs) {
-                EXPECT_EQ(log.file + " " + log.categ, "mjpegstreamer player");
+                EXPECT_EQ(log.file + " " + log.categ + log.level, "mjpegstreamer player1");
                 text += log.text;
             }
             EXPECT_EQ(text, expected.log);
@@ -120,7 +136,7 @@ TEST(Playback, FailuresHaveTheirAnswers) {
 TEST(Playback, LogLinesNameTheirFunctions) {
     struct Row {
         const char* method;
-        Script before;
+        Change before;
         std::vector<std::string> functions;
     };
     const auto lose = [](ScriptedPlatform& p) { p.events.clear(); };
@@ -132,7 +148,7 @@ TEST(Playback, LogLinesNameTheirFunctions) {
         {kByIndex, lose + Params({{"recEvtType", 1}}), {"GetAlertEventFilename"}},
         {kByIndex, lose + Params({{"recEvtType", 2}}), {"GetPosEventFilename"}},
         {kByIndex, [](auto& p) { p.has_memory = false; }, {"StreamOut"}},
-        {kByIndex, lose + [](auto& p) { p.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 0; }, {}},
+        {kByIndex, lose + [](auto& p) { p.log_cfg.m_CategLevel[68] = 0; }, {}},
     };
     for (const auto& row : rows) {
         Player player(row.method);
@@ -168,50 +184,62 @@ TEST(Playback, OnlyAGrowingEventIsFlushed) {
     struct Row {
         int flush, id;
         bool is_recording;
+        int result;  // of making it playable
         Calls calls;
     };
     const Calls load = {"Event::Load(3,0,0,0)"};
     for (const Row& row :
-         {Row{1, 3, true, load + Calls{"DoEventTimelyPlay(3,0)"} + load}, Row{1, 3, false, load + load},
-          Row{1, 0, true, load + load}, Row{2, 3, true, load}, Row{0, 3, true, load}}) {
+         {Row{1, 3, true, 0, load + Calls{"DoEventTimelyPlay(3,0)"} + load},
+          Row{1, 3, true, -1, load + Calls{"DoEventTimelyPlay(3,0)"} + load},
+          Row{1, 1, true, 0, load + Calls{"DoEventTimelyPlay(1,0)"} + load}, Row{1, 3, false, 0, load + load},
+          Row{1, 0, true, 0, load + load}, Row{2, 3, true, 0, load}, Row{0, 3, true, 0, load}}) {
         Player player(kByTime);
         player.platform.params["flushHeader"] = row.flush;
+        player.platform.timely_play_result = row.result;
         player.platform.events[3].m_Id = row.id;
         player.platform.events[3].m_blRecording = row.is_recording;
         player.Run({}, 1);
         const Calls from = player.platform.CallsFrom("Event::Load");
         EXPECT_EQ(Calls(from.begin(), std::find(from.begin(), from.end(), "IsFileExist(/rec/3)")), row.calls);
+        EXPECT_EQ(player.Frames(), "P0 ");
     }
 }
 
 TEST(Playback, PassesTheSessionOn) {
     struct Row {
         const char* name;
-        Script at_second;
+        std::map<int, Change> plan;
         std::size_t pictures;
-        const char* last;  // the stream's last call
-        const char* pid_file;
+        const char* last;  // what the stream's last call is like
+        std::string pid_file;
     };
     const auto check = Signal(SIGUSR1);
     const Row rows[] = {
-        {"still ours", check, 4, "ReadFrame", "none"},
-        {"a newer player's", [](auto&) { WritePidFile("1"); } + check, 2, "ReadFrame", "1"},
-        {"nobody's", [](auto&) { WritePidFile("x"); } + check, 2, "ReadFrame", "x"},
-        {"gone", [](auto&) { std::remove(kPidFile.c_str()); } + check, 2, "Get", "none"},
-        {"a newer player's, untold", [](auto&) { WritePidFile("1"); }, 4, "ReadFrame", "none"},
+        {"still ours", {{2, check}}, 4, "ReadFrame.*", "none"},
+        {"still ours, told after the last check", {{-4, check}}, 4, "ReadFrame.*", std::to_string(getpid())},
+        {"a newer player's", {{2, [](auto&) { WritePidFile("1"); } + check}}, 2, "ReadFrame.*", "1"},
+        {"nobody's", {{2, [](auto&) { WritePidFile("x"); } + check}}, 2, "ReadFrame.*", "x"},
+        {"gone", {{2, [](auto&) { std::remove(kPidFile.c_str()); } + check}}, 2, "Get.*|Set.*", "none"},
+        {"a newer player's, untold", {{2, [](auto&) { WritePidFile("1"); }}}, 4, "ReadFrame.*", "none"},
     };
+    const Change modes[] = {Nothing, Params({{"changerate", 1}}), Params({{"interval", 0}})};
     for (const auto& row : rows) {
-        for (const char* method : {kByIndex, kByTime}) {
-            SCOPED_TRACE(std::string(method) + " " + row.name);
-            Player player(method);
-            player.platform.params["changerate"] = 1;
+        for (int mode = 0; mode < 6; ++mode) {
+            SCOPED_TRACE(row.name + std::to_string(mode));
+            Player player(mode < 3 ? kByIndex : kByTime);
+            modes[mode % 3](player.platform);
+            if (row.plan.begin()->first < 0 && mode % 3 == 2) {
+                continue;  // sampling has no wait
+            }
             WritePidFile("older player");
             std::string at_start;
-            EXPECT_EQ(player.Run({{1, [&](auto&) { at_start = PidFile(); }}, {2, row.at_second}}, 4), "");
+            std::map<int, Change> plan = row.plan;
+            plan[1] = [&](auto&) { at_start = PidFile(); };
+            EXPECT_EQ(player.Run(plan, 4), "");
             EXPECT_EQ(at_start, std::to_string(getpid()));
             const std::string frames = player.Frames();
             EXPECT_EQ(static_cast<std::size_t>(std::count(frames.begin(), frames.end(), ' ')), row.pictures);
-            EXPECT_THAT(player.calls.at(player.calls.size() - 2), testing::StartsWith(row.last));
+            EXPECT_THAT(player.calls.at(player.calls.size() - 2), testing::MatchesRegex(row.last));
             EXPECT_EQ(PidFile(), row.pid_file);
             EXPECT_TRUE(player.platform.logs.empty());
         }

@@ -102,13 +102,13 @@ TEST(Authenticate, AsksInOrderAndNoMoreThanItNeeds) {
 TEST(PrivProfile, IsLoadedOnceForTheLoginOrForAPeer) {
     for (const bool is_peer : {false, true}) {
         ScriptedPlatform platform;
-        platform.params["privData"]["a"] = 1;
+        platform.params["privData"]["privilege"] = 3;
         ProbeHandler handler(platform);
         handler.m_bPairAuth = is_peer;
         PrivProfile* const profile = handler.GetPrivProfile();
-        EXPECT_EQ(profile->GetId(), 1);
+        EXPECT_EQ(profile->GetPrivilege(), 3) << "narrowed from 2";
         EXPECT_EQ(handler.GetPrivProfile(), profile);
-        const Calls load = {"GetParam(privData,null)", "UpdateByJson({\"a\":1})"};
+        const Calls load = {"GetParam(privData,null)", "UpdateByJson({\"privilege\":3})"};
         EXPECT_EQ(platform.calls,
                   (is_peer ? Calls{"PrivProfileGetByUid(1024)"} : Calls{"GetLoginUID()", "PrivProfileGetByUid(7)"}) +
                       load);
@@ -264,8 +264,8 @@ TEST(LogFilter, AdmitsByCategoryOrOwnProcess) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         ScriptedPlatform platform;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = row.category_level;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 1000;
+        platform.log_cfg.m_CategLevel[32] = row.category_level;
+        platform.log_cfg.m_CategLevel[68] = 1000;
         platform.log_cfg.m_PidCount = row.pid_count;
         std::copy(row.pids.begin(), row.pids.end(), platform.log_cfg.m_PidLevel);
         int evaluated = 0;
@@ -287,11 +287,10 @@ TEST(LogFilter, WithoutConfigurationOnlyUnconditionalLines) {
 
 TEST(LogFilter, NamesCategoryAndLevel) {
     ScriptedPlatform platform;
-    platform.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = 6;
+    platform.log_cfg.m_CategLevel[32] = 6;
     LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL_INFO, "source", "named\n");
-    LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL_WARN, "source", "not named\n");
-    EXPECT_EQ(platform.logs[0].categ + " " + platform.logs[0].level, "liveview info");
-    EXPECT_EQ(platform.logs[1].level, "unknown");
+    LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL(3), "source", "not named\n");
+    EXPECT_THAT(platform.calls, ElementsAre("log live/5 named\n", "log live/unknown not named\n"));
 }
 
 }  // namespace

@@ -98,7 +98,7 @@ int DevCapHandler::LoadByCam(const Camera& camera) {
     m_SoundSupport.m_pTarget = sound == Sound::kNoTarget ? nullptr : m_pDevice.get();
     m_SoundSupport.m_pFunctor = sound == Sound::kNoFunctor ? nullptr : m_pSoundSupport.get();
     m_SoundSupport.m_Name = "Sound";
-    return Script().cap_failures.count(camera.m_Id) != 0 ? 1 : 0;
+    return Script().cap_failures.count(camera.m_Id) != 0 ? -1 : 0;
 }
 unsigned int CamCapUtils::GetLiveStmPtzCapByUserName(const DevCapHandler&, const Camera& camera,
                                                      const std::string& userName) {
@@ -110,7 +110,7 @@ LHShmCommonCfg* LHShmCommonCfgAt() {
     return Script().has_common_cfg ? &Script().common_cfg : nullptr;
 }
 long GetMonoTimeSec() {
-    return static_cast<long>(Script().now);
+    return Script().monotonic_now;
 }
 
 ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
@@ -131,8 +131,9 @@ void RingCall(const ShmStreamFifo* ring, const std::string& name, const Argument
     Call((ring == AudioRing() ? "audio " + name : name).c_str(), arguments...);
 }
 
-const char* NameOf(const __tag_DATA_ENTRY_INFO* position) {
-    return position == nullptr ? "null" : position == Script().audio_position ? "audio position" : "position";
+std::string NameOf(const __tag_DATA_ENTRY_INFO* position) {
+    const auto found = Script().positions.find(position);
+    return found == Script().positions.end() ? "stray position" : found->second;
 }
 
 const char* NameOf(const DataEntry* entry) {
@@ -177,14 +178,14 @@ void Give(const std::string& extra, unsigned char* data, int& length) {
 }  // namespace
 
 void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO* position) {
-    Script().audio_position = this == AudioRing() ? position : Script().audio_position;
-    RingCall(this, "StartRead");
+    Script().positions.emplace(position, this == AudioRing() ? "audio position" : "position");
+    RingCall(this, "StartRead", NameOf(position));
 }
 DataEntry* ShmStreamFifo::ReadLatest() {
-    return ReadLatest(-1, nullptr);
+    return RingCall(this, "ReadLatest"), NextPicture();
 }
-DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
-    return RingCall(this, "ReadLatest", lastSeq), NextPicture();
+DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
+    return RingCall(this, "ReadLatest", lastSeq, NameOf(position)), NextPicture();
 }
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     RingCall(this, "ReadNext", lastSeq, NameOf(position));
@@ -199,8 +200,9 @@ void ShmStreamFifo::ReadIFrameFinish(DataEntry* entry, __tag_DATA_ENTRY_INFO* po
 void ShmStreamFifo::ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position) {
     RingCall(this, "ReadFinish", NameOf(entry), flag, NameOf(position));
 }
-void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO*) {
-    RingCall(this, "StopRead");
+void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
+    RingCall(this, "StopRead", NameOf(position));
+    Script().positions.erase(position);
 }
 void ShmStreamFifo::GetVdoExtraData(unsigned char* data, int& length) {
     RingCall(this, "GetVdoExtraData", length);
@@ -230,7 +232,7 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
     const std::string text(static_cast<const char*>(data), length < 100 ? static_cast<std::size_t>(length) : 0);
     Call("Write", contentType, data == nullptr ? "null" : text, length, extra == nullptr ? "null" : extra);
     m_blHeadSent = true;
-    return 0;
+    return Script().write_result;
 }
 int MultipartResponse::Write(const char* contentType, const char* codecs, const unsigned char* videoExtra,
                              int videoExtraLength, const unsigned char* audioExtra, int audioExtraLength,
@@ -240,5 +242,5 @@ int MultipartResponse::Write(const char* contentType, const char* codecs, const 
     };
     Call("Write", contentType, codecs, text(videoExtra, videoExtraLength), text(audioExtra, audioExtraLength),
          timestamp, text(data, length), length, extra == nullptr ? "null" : extra);
-    return 0;
+    return Script().write_result;
 }

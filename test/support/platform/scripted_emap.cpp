@@ -12,8 +12,8 @@ using lookhaven::test::Script;
 
 namespace {
 
-bool IsUnknown(int id) {
-    return Script().unknown_devices.count(id) != 0;
+int Known(int id) {
+    return Script().unknown_devices.count(id) != 0 ? -1 : 0;
 }
 
 }  // namespace
@@ -52,7 +52,7 @@ int Camera::LoadByIdOnRecServer(int idOnServer, int serverId) {
 int IOModule::Load(int moduleId) {
     m_Id = moduleId;
     m_Name = "io" + std::to_string(moduleId);
-    return Call("IOModule::Load", moduleId), IsUnknown(moduleId);
+    return Call("IOModule::Load", moduleId), Known(moduleId);
 }
 int IOModule::LoadByIdOnRecServer(int idOnServer, int serverId) {
     return Load(100 * serverId + idOnServer);
@@ -65,7 +65,7 @@ std::string IOModule::GetName() const {
 }
 int POS::Load(int posId) {
     m_PairedCamIdOnRec = posId + 1;
-    return Call("POS::Load", posId), IsUnknown(posId);
+    return Call("POS::Load", posId), Known(posId);
 }
 int POS::LoadByIdOnRecServer(int idOnServer, int serverId) {
     return Load(100 * serverId + idOnServer);
@@ -91,9 +91,11 @@ int GetIOModuleIdOnHost(int serverId, int idOnServer) {
     return 100 * serverId + idOnServer;
 }
 void GetPairedCam(int moduleId, int portIdx, int& camId, int& camServerId, int& camIdOnServer) {
-    camId = moduleId + 10 + portIdx;
-    camServerId = 2;
-    camIdOnServer = moduleId;
+    if (portIdx >= 0) {  // else there is none, and nothing is stored
+        camId = moduleId + 10 + portIdx;
+        camServerId = 2;
+        camIdOnServer = moduleId;
+    }
 }
 
 SlaveHx::SlaveHx(std::string ip, int port, std::string cookie)

@@ -49,6 +49,10 @@ struct ScriptedFrame {
 
 enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
 
+class ScriptedPlatform;
+// What a test changes in the script.
+using Change = std::function<void(ScriptedPlatform&)>;
+
 // While one exists it is the platform of the process, and sleep, usleep, time, sigaction, shmdt and the state of standard
 // output are its script's. Every call is first recorded, then shown to on_call, which may change the script or throw.
 class ScriptedPlatform {
@@ -93,16 +97,16 @@ class ScriptedPlatform {
     std::deque<std::optional<ScriptedFrame>> audio_frames;
     std::optional<ScriptedFrame> newest_key_frame;
     std::string video_codec = "H264", audio_codec = "AAC", video_extra = "V", audio_extra = "A";
-    const void* audio_position = nullptr;  // the one that reads the audio ring
+    std::map<const void*, std::string> positions = {{nullptr, "null"}};  // those that read a ring, by name
 
     std::map<int, Event> events;  // for Load, whatever the kind
     bool has_file = true;         // under any name but the empty one
     int init_result = 0, frame_info_result = 0;
     float frame_rate = 10;
-    int frame_count = 100;
+    int frame_count = 100, grown_by = 0;  // as told, and those that can be read beyond it
     std::set<int> broken_frames;
     int client_number = -1;  // what the client set on a player's channel
-    int progress_result = 0;
+    int progress_result = 0, timely_play_result = 0;
     bool has_memory = true;  // for a block of 2 MiB
 
     std::list<Event> found_events;
@@ -118,9 +122,12 @@ class ScriptedPlatform {
     bool has_common_cfg = true;
     DbgLogCfg log_cfg = {};
 
-    std::time_t now = 1000000;  // wall clock and monotonic clock; sleeping moves it
+    std::time_t now = 1700000000;  // wall clock; sleeping moves both
+    long monotonic_now = 1000000;
+    int lock_result = 0;  // of common_cfg's mutex, which is locked all the same
     std::set<int> failing_signals;
     bool flush_fails = false;
+    int write_result = 0;  // of multipart output
     bool is_eof = false, is_error = false;
     const void* watched_mutex = nullptr;  // record what is done with it, and the end of a profile
     std::list<std::vector<std::uint32_t>> entries;
@@ -128,6 +135,15 @@ class ScriptedPlatform {
 
 // The one that exists, or null.
 ScriptedPlatform* CurrentPlatform();
+
+inline void Nothing(ScriptedPlatform&) {}
+inline Change Params(const std::map<std::string, Json::Value>& params) {
+    return [params](ScriptedPlatform& platform) {
+        for (const auto& [name, value] : params) {
+            platform.params[name] = value;
+        }
+    };
+}
 
 // The address that stands for a ring of sound.
 ShmStreamFifo* AudioRing();

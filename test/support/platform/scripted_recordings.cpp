@@ -121,7 +121,7 @@ std::string PosEvent::GetFullPath() const {
     return m_Footage.GetFullPath();
 }
 int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type) {
-    return Call("DoEventTimelyPlay", event.m_Id, type), 0;
+    return Call("DoEventTimelyPlay", event.m_Id, type), Script().timely_play_result;
 }
 bool IsFileExist(const std::string& path) {
     return Call("IsFileExist", path), Script().has_file && !path.empty();
@@ -139,7 +139,7 @@ int JpegExtractor::GetFrameInfo(__tag_JPEG_FRAME_INFO& info) {
 }
 int JpegExtractor::ReadFrame(int index, unsigned char* buffer, int& length) {
     Call("ReadFrame", index, length);
-    if (index < 0 || index >= Script().frame_count || Script().broken_frames.count(index) != 0) {
+    if (index < 0 || index >= Script().frame_count + Script().grown_by || Script().broken_frames.count(index) != 0) {
         return -1;
     }
     length = static_cast<int>(("P" + std::to_string(index)).copy(reinterpret_cast<char*>(buffer), 16));
