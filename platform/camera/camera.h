@@ -43,17 +43,19 @@ class LH_PLATFORM_API Camera {
   public:
     Camera();
 
-    // Loads the record of the camera, whether or not the caller may see it. serverId 0 is this host; archiveId 0 is the
-    // live record. Returns 0, or non-zero when there is no such camera; then the record is unchanged.
+    // Loads the camera's record without checking the caller's rights. serverId 0 is this host; archiveId 0 is the live
+    // record. Returns 0, or non-zero when there is no such camera; then the record is unchanged.
     int Load(int camId, int serverId, int archiveId);
-    // Likewise for a camera that a recording server owns, by its id there.
+    // The same for a camera that a recording server owns, by its id there; afterwards m_Id is its id on this host.
     int LoadByIdOnRecServer(int idOnServer, int serverId);
 
-    // The profile that the camera's live view is configured to show.
+    // The profile that is configured for the camera's live view.
     CAM_PROFILE_TYPE GetLiveProfile() const;
-    // The number of the live stream that carries the profile. A profile that the camera lacks gives the live profile's.
+    // The number of the live stream that carries the profile; for a profile that the camera lacks, that of its live
+    // profile.
     int GetUiStreamNo(CAM_PROFILE_TYPE profile) const;
-    // The folder that holds the camera's recordings and recording log; empty when it has none.
+    // The folder of the camera's recordings and recording log; empty when it has none or the caller may not play it
+    // back. Reads the store on each call.
     std::string GetStoragePath() const;
 
     int m_Id;
@@ -69,9 +71,10 @@ class LH_PLATFORM_API Camera {
 
 // The cameras of this host in list order. deniedIds: ids to leave out, decimal, ascending, joined by ",". groupIds:
 // when not empty, only cameras of these groups. onlyEnabled leaves out disabled cameras, withDeleted adds removed ones
-// whose recordings remain, withRemote adds cameras of recording servers.
+// whose recordings remain, withRemote adds cameras of recording servers; a platform may ignore the last two. Throws
+// when the cameras cannot be read: an empty list would mean a host without cameras.
 LH_PLATFORM_API std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds,
                                                   const std::string& deniedIds, bool withDeleted, bool withRemote);
 
-// The port at which a client logs in directly; 0 or negative when there is none.
+// The TCP port for direct login of clients; 0 or negative when there is none, which fails the whole camera list.
 LH_PLATFORM_API int GetLoginPort();
