@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps: what a client gets of each kind of item, in which order, and which items it does not get.
+// E-maps: how each kind of item is described, their order, and which are left out.
 #include <sstream>
 
 #include <gmock/gmock.h>
@@ -13,7 +13,7 @@ using Item = __tag_EMAP_ITEM_INFO;
 
 namespace {
 
-// E-map 5, asked for by user 7. The host knows cameras 1, 2 and 201, which is camera 1 of server 2.
+// E-map 5 for user 7. The host knows cameras 1, 2 and 201, which is camera 1 of server 2.
 struct Map {
     explicit Map(const Change& script) {
         for (const int id : {1, 2, 201}) {
@@ -84,7 +84,7 @@ TEST(Emap, AsksInOrderAndDescribesThePicture) {
 struct ItemRow {
     Item item;
     bool is_cms_host;
-    std::string members;  // beside those of every item
+    std::string members;  // in addition to those of every item
 };
 
 TEST(Emap, DescribesEachKind) {

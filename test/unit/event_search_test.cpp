@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Event search: which days and seconds are marked, what is asked in which order, who is turned away.
+// Event search: which days and seconds are marked, the order of calls, which requests are rejected.
 #include <climits>
 
 #include <gmock/gmock.h>
@@ -17,7 +17,7 @@ namespace {
 
 constexpr int kDay = 86400;
 
-// A search of cameras 2 and 4 by a user who may not see 9 and 12 nor group 6.
+// A search of cameras 2 and 4 by a user who may not access cameras 9 and 12 nor group 6.
 struct Search {
     explicit Search(const char* method) {
         platform.method = method;
@@ -106,7 +106,7 @@ TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
     struct Row {
         int start, day_count;
         std::ptrdiff_t slots;
-        const char* span;  // asked for
+        const char* span;  // of the query
     };
     const Row rows[] = {
         {0, 128, 128, "0,11059200"},     {0, 129, 128, "0,11059200"},
@@ -131,7 +131,7 @@ TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
 TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
     struct Row {
         const char* list;
-        const char* ids;  // "" when nothing is asked
+        const char* ids;  // "" for no query
     };
     const Row rows[] = {
         {"", ""},     {",,", ""}, {"2,4", "2+4"}, {"4,2,4", "2+4"},      {"1,,x,2", "2"}, {"2x, 4", "2+4"},
@@ -151,7 +151,7 @@ TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
     }
 }
 
-struct TurnedAwayRow {
+struct RejectedRow {
     const char* name;
     Change before;
     std::string log;   // "" for none
@@ -159,9 +159,9 @@ struct TurnedAwayRow {
     const char* last;  // call before the answer
 };
 
-TEST(EventSearch, TurnsAway) {
+TEST(EventSearch, Rejects) {
     const std::string uid = "Failed to load priv profile of Uid[7].\n", span = "Error time duration.\n";
-    const TurnedAwayRow both[] = {
+    const RejectedRow both[] = {
         {"no profile, and a forbidden group", [](auto& p) { p.profile_id = 0, p.params["camGrpId"] = 6; }, uid, 401,
          "PrivProfileGetByUid"},
         {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, "PrivProfileGetByUid"},
@@ -178,7 +178,7 @@ TEST(EventSearch, TurnsAway) {
     const auto from_to = [](int from, int to) {
         return [=](ScriptedPlatform& p) { p.params["from"] = from, p.params["to"] = to; };
     };
-    const TurnedAwayRow only_events[] = {
+    const RejectedRow only_events[] = {
         {"no span", from_to(5, 5), span, 401, "PrivProfileGetByUid"},
         {"negative span of nobody", [](auto& p) { p.params["to"] = 5, p.profile_id = 0; }, span, 401,
          "PrivProfileGetByUid"},
@@ -189,7 +189,7 @@ TEST(EventSearch, TurnsAway) {
         {"the last second", from_to(INT_MAX - 1, INT_MAX), "", 0, "FillRecLogMap"},
         {"over the wrap of time", from_to(INT_MAX, INT_MIN), "", 0, "FillRecLogMap"},
     };
-    const auto check = [](const char* method, const TurnedAwayRow& row) {
+    const auto check = [](const char* method, const RejectedRow& row) {
         SCOPED_TRACE(std::string(method) + " " + row.name);
         Search search(method);
         row.before(search.platform);

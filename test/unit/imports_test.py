@@ -3,8 +3,8 @@
 #
 # Checks what the module needs of the process that loads it: imports_test.py MODULE BINDING PLATFORM_HEADERS
 #
-# MODULE is the build without a platform. What it leaves undefined and no library that it names defines must be declared in
-# the headers and exported by BINDING; and it may name no library but those of the C++ run-time and JSON.
+# MODULE is the build without a platform. What it leaves undefined and no library that it names defines must be declared
+# in the headers and exported by BINDING; and it may name no library but those of the C++ run-time and JSON.
 import pathlib
 import re
 import subprocess

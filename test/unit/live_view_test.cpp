@@ -17,7 +17,7 @@ const Calls kDispatch = {"GetAPIMethod()", "GetParam(camera,0)", "GetParam(snaps
 const Calls kItem = kDispatch + kSignals + Calls{"GetParam(itemType,0)"};
 const Calls kCamera = kItem + Calls{"GetParam(isFromPlugin,0)", "GetParam(profileType,-1)", "Load(5,0,0)"};
 const Calls kStream = {"StartLive(5,51)", "LiveStreamFifoAt(5,51)"};
-// A pass that finds no picture and ends the output, and the way out of the loop.
+// A pass that finds no picture and ends the output; then the end of the stream.
 const Calls kLastPass = {"UpdateStamp()", "ReadLatest(10001,position)", "ReadFinish(null,1,position)", "usleep(10000)"};
 const Calls kStart = {"StartRead(position)"};
 const Calls kClose = {"StopRead(position)", "shmdt()", "SetEnableOutput(0)"};

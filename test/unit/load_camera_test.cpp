@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The camera list: whom it shows what, and what it says when it cannot.
+// The camera list: which cameras it holds for whom, and what is logged when it fails.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -61,7 +61,7 @@ TEST(LoadCamera, Answers) {
         {"negative camera", [](auto& p) { p.params["camera"] = -3; }, answer(Camera4("1"), tail(-3, "1", "false"))},
         {"privilege 0", [](auto& p) { p.privilege = 0; }, answer(Camera4("1"), tail(4, "1", "true"))},
         {"privilege 1", [](auto& p) { p.privilege = 1; }, answer(Camera4("1"), tail(4, "1", "true"))},
-        {"deaf", [](auto& p) { p.sound[4] = Sound::kNo; }, answer(Camera4("0"), tail(4, "1", "false"))},
+        {"no sound", [](auto& p) { p.sound[4] = Sound::kNo; }, answer(Camera4("0"), tail(4, "1", "false"))},
         {"all disabled", [](auto& p) { p.camera_list = {MakeCamera(3, 1, false)}; },
          "SetSuccess({\"CamNum\":1,\"EnableCamNum\":0,\"ShowAll\":1,\"isManager\":false,\"selected\":-1})"},
     };

@@ -38,7 +38,7 @@ Calls WriteDelta(const std::string& data) {
 Calls WriteSound(const std::string& data) {
     return WriteOf("audio/AAC", data, "7");
 }
-// The two halves of a pass around what is written.
+// The two halves of a pass, with what is written in between.
 Calls Video(int seq, const Calls& written, const char* entry = "entry") {
     return Calls{"UpdateStamp()", "ReadNext(" + std::to_string(seq) + ",position)"} + written +
            Calls{std::string("ReadFinish(") + entry + ",1,position)"};

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which frames each loop of playback sends, how fast, and what it tells meanwhile.
+// Which frames each loop of playback sends, how fast, and what it publishes meanwhile.
 #include <climits>
 #include <cmath>
 
@@ -25,7 +25,7 @@ const Change kGrown = [](auto& p) { p.frame_count = 2, p.grown_by = 9; };
 const Change kBroken = [](auto& p) { p.write_result = -1, p.flush_fails = true; };
 
 const FramesRow kFrames[] = {
-    {"the last stands", kByIndex, Frames(3), {}, "0:P0 1:P1 2:P2 2:P2 2:P2 "},
+    {"the last is held", kByIndex, Frames(3), {}, "0:P0 1:P1 2:P2 2:P2 2:P2 "},
     {"lowest ids",
      kByIndex,
      Params({{"eventid", 1}, {"timestamp", 1}}) + [](auto& p) { p.events[1] = p.events[3]; },
@@ -101,7 +101,7 @@ const FramesRow kFrames[] = {
      {},
      "0:P0 "},
     {"stop kept in 32 bits", kByTime, Params({{"stopTimeMS", (Json::Int64{1} << 32) + 39}}), {}, "P0 P0 P1 P2 "},
-    {"paused in the midst", kByTime, Params({{"startTimeMS", 70}}), {{3, Signal(SIGUSR2)}}, "P7 P7 P8 P8 P8 "},
+    {"paused in the middle", kByTime, Params({{"startTimeMS", 70}}), {{3, Signal(SIGUSR2)}}, "P7 P7 P8 P8 P8 "},
     {"interval 2",
      kByTime,
      Frames(30) + Params({{"interval", 2}, {"playrate", 4}}),

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Playback: what a request reads and gets, and how a session passes from player to player.
+// Playback: what a request reads, how it is answered, and how a session passes from player to player.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -75,7 +75,7 @@ TEST(Playback, FailuresHaveTheirAnswers) {
     const FailureRow rows[] = {
         {"event 0, nor a signal", Params({{"eventid", 0}}) + [](auto& p) { p.failing_signals = {SIGTERM}; }, bad,
          forgiven},
-        {"start before the begin", Params({{"framestart", -1}, {"startTimeMS", -1}}), bad, forgiven},
+        {"negative start", Params({{"framestart", -1}, {"startTimeMS", -1}}), bad, forgiven},
         {"start beyond 31 bits", Params({{"framestart", INT_MIN}, {"startTimeMS", Json::Int64{1} << 31}}), bad,
          forgiven},
         {"no stream key", [](auto& p) { p.params.erase("timestamp"); }, bad, forgiven},
@@ -210,7 +210,7 @@ TEST(Playback, PassesTheSessionOn) {
         const char* name;
         std::map<int, Change> plan;
         std::size_t pictures;
-        const char* last;  // what the stream's last call is like
+        const char* last;  // pattern of the stream's last call
         std::string pid_file;
     };
     const auto check = Signal(SIGUSR1);

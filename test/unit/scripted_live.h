@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A live view against the scripted platform: its handler, its stream's loop, what happens meanwhile.
+// Runs live view requests against the scripted platform.
 #pragma once
 
 #include <map>
@@ -70,7 +70,7 @@ inline void RunLoop(const LoopRow& row, const char* func, const std::function<vo
     }
 }
 
-// The way out of the loop, up to what closes it.
+// The line that ends the loop.
 inline Calls LoopExit(const char* eof, const char* error, const char* stop) {
     return {std::string("log live/5 Exit loop [Cam: 5, feof: ") + eof + ", ferror: " + error + ", gblStop: " + stop +
             "]\n"};

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A player of recorded events against the scripted platform: what it calls, what it sends, and what happens meanwhile.
+// Runs a player of recorded events against the scripted platform.
 #pragma once
 
 #include <csignal>
@@ -50,8 +50,8 @@ struct Player {
     }
     ~Player() { std::remove(kPidFile.c_str()); }
 
-    // What standard output got. At a picture's number, counted from 1, happens what is planned for it; 0: before the
-    // first; -2: in the wait behind the second. SIGTERM comes at the last one.
+    // Returns what was written to standard output. plan: changes by the number of the picture, from 1, at which they
+    // happen; 0: before the first; -2: in the wait after the second. SIGTERM is raised at the last picture.
     std::string Run(const std::map<int, Change>& plan, int last_picture) {
         int pictures = 0;
         platform.on_call = [&](const std::string& call) {
@@ -73,7 +73,7 @@ struct Player {
         return capture.Text();
     }
 
-    // What stands between the text and the next comma or bracket in each call that begins with it, joined.
+    // Of each call that begins with the text, what follows it up to the next comma or bracket; joined.
     std::string All(const std::string& text) const {
         std::string all;
         for (const auto& call : calls) {
@@ -84,7 +84,7 @@ struct Player {
         return all;
     }
 
-    // What was sent: 4:P4 for a picture behind its index, P4 for one without.
+    // The pictures sent: 4:P4 for one after its index, P4 for one without.
     std::string Frames() const {
         std::string frames;
         for (const auto& call : calls) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's cameras, live streams and multipart output on a script.
+// Test double of the platform's cameras, live streams and multipart output.
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
@@ -90,7 +90,7 @@ int DevCapHandler::LoadByCam(const Camera& camera) {
     Call("LoadByCam", camera.m_Id);
     const Sound sound = Script().sound[camera.m_Id];
     m_pDevice = std::make_unique<DPObjectBase>();
-    // Twice a yes, so that a number is not passed on in place of one.
+    // Not 1, to tell a truth value from a number that is passed on.
     m_pSoundSupport = std::make_unique<SoundFunctor>(sound == Sound::kYes ? 2 : 0);
     if (sound == Sound::kWrongType) {
         m_pSoundSupport = std::make_unique<MemFuncBase>();
@@ -125,7 +125,7 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
 
 namespace {
 
-// The call's name, for a ring of sound with a word in front.
+// Records the call; the name of one on the audio ring begins with "audio".
 template <typename... Arguments>
 void RingCall(const ShmStreamFifo* ring, const std::string& name, const Arguments&... arguments) {
     Call((ring == AudioRing() ? "audio " + name : name).c_str(), arguments...);

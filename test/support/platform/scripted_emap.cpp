@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's e-maps and their devices on a script. A device that server 2 owns has here the id 200 and its id there;
-// camera 1 has two inputs and one output, port 0 of module 7 is of type 4.
+// Test double of the platform's e-maps and their devices. A device of server 2 has the local id 200 + its id there;
+// camera 1 has two inputs and one output, port 0 of module 7 has type 4.
 #include "platform/admission/slavehx.h"
 #include "platform/emap/device.h"
 #include "platform/emap/emap.h"
@@ -91,7 +91,7 @@ int GetIOModuleIdOnHost(int serverId, int idOnServer) {
     return 100 * serverId + idOnServer;
 }
 void GetPairedCam(int moduleId, int portIdx, int& camId, int& camServerId, int& camIdOnServer) {
-    if (portIdx >= 0) {  // else there is none, and nothing is stored
+    if (portIdx >= 0) {  // otherwise no camera is paired, and nothing is stored
         camId = moduleId + 10 + portIdx;
         camServerId = 2;
         camIdOnServer = moduleId;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The script's life, and the platform's request, admission, privilege and log on it.
+// Test double of the platform's request, admission, privileges and log; construction and destruction of the script.
 #include "test/support/platform/scripted_platform.h"
 
 #include <cstdarg>
@@ -141,7 +141,7 @@ Json::Value APIRequest::GetParam(const std::string& name, const Json::Value& def
     if (found != Script().params.end()) {
         return found->second;
     }
-    // The framework takes a text for JSON when it is nothing else, a default too.
+    // As the framework does, turns a text that is a number into one, a default too.
     const bool is_number = defaultValue.isString() && !defaultValue.asString().empty() &&
                            defaultValue.asString().find_first_not_of("-0123456789") == std::string::npos;
     return is_number ? Json::Value(std::stoi(defaultValue.asString())) : defaultValue;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's events, recordings and pacing on a script. The picture of frame 7 is "P7", its time 70 ms.
+// Test double of the platform's events, recordings and pacing. The picture of frame 7 is "P7", its time 70 ms.
 #include "platform/recording/event.h"
 #include "platform/recording/jpegextractor.h"
 #include "platform/recording/pacing.h"
@@ -105,7 +105,7 @@ std::uint64_t Event::GetSize() const {
     return m_Size;
 }
 bool Event::IsOriginalView() const {
-    return m_CamId == 8;  // the script's fisheye
+    return m_CamId == 8;  // the fisheye camera
 }
 int AlertEvent::Load(int eventId, int mountId, int serverId, int archiveId) {
     return Find("AlertEvent::Load", eventId, mountId, serverId, archiveId, *this);

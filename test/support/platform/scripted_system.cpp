@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The system calls that a script governs; the linker sends the module's calls here (--wrap). Without a script they pass.
+// The system calls that a script decides about; the linker redirects calls here (--wrap). Without a script they are
+// passed on.
 #include <cerrno>
 #include <cstdio>
 
