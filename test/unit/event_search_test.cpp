@@ -2,13 +2,14 @@
 //
 // Event search: which days and seconds are marked, the order of calls, which requests are rejected.
 #include <climits>
+#include <sstream>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "player/multiplayer/multiplayer.h"
 #include "player/multiplayer/time_zone_keys.h"
-#include "test/support/platform/scripted_platform.h"
+#include "test/support/platform/record.h"
 
 using namespace lookhaven::test;
 using testing::ElementsAre;
@@ -270,25 +271,29 @@ TEST(EnumEvent, DescribesEachEvent) {
         search.platform.rec_log_result = rec_log_result;
         Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search.platform);
         search.Run();
-        const auto entry = [](const std::string& audio, const std::string& id) {
-            const auto one = [&](const char* archived, const char* size, const char* fisheye, const char* recording) {
-                return std::string("{\"archived\":") + archived + ",\"audio_format\":\"" + audio +
-                       "\",\"event_size\":" + size + ",\"fisheye_origin_view\":" + fisheye +
-                       ",\"frameCount\":33,\"frame_count\":33,\"id\":31,\"id_on_RecServer\":1031,\"img_height\":360,"
-                       "\"img_width\":640,\"is_recording\":" +
-                       recording +
-                       ",\"name\":\"2/x.mkv\",\"record_type\":7,\"start\":1000001,\"startTime\":1000001,"
-                       "\"stop\":1000002,\"stopTime\":1000002,\"video_type\":3}";
-            };
-            return "{\"camera_id\":" + id + ",\"event\":[" + one("false", "1.5", "true", "true") + "," +
-                   one("true", "8388608.0", "false", "false") + "],\"total\":2}";
-        };
-        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"camera\":[" + entry("", "4") + "," + entry("AAC", "1") +
-                                                    "," + entry("AAC", "2") + "," + entry("AAC", "2") + "]})");
-        const auto query = [](const std::string& rest) { return "EventListGetAll(0,-1,1000000,1000060," + rest; };
-        EXPECT_THAT(search.All("EventListGetAll"),
-                    ElementsAre(query("4,0,0,6,camera_id)"), query("1,0,0,1,camera_id)"), query("2,0,0,6,camera_id)"),
-                                query("2,0,0,6,camera_id)")));
+        Json::Value first, expected;
+        std::istringstream(
+            R"({"archived":false,"event_size":1.5,"fisheye_origin_view":true,"frameCount":33,"frame_count":33,"id":31,
+                "id_on_RecServer":1031,"img_height":360,"img_width":640,"is_recording":true,"name":"2/x.mkv",
+                "record_type":7,"start":1000001,"startTime":1000001,"stop":1000002,"stopTime":1000002,"video_type":3})") >>
+            first;
+        Json::Value second = first;
+        second["archived"] = true;
+        second["fisheye_origin_view"] = second["is_recording"] = false;
+        second["event_size"] = 8388608.0;
+        Calls queries;
+        for (const int id : {4, 1, 2, 2}) {
+            first["audio_format"] = second["audio_format"] = id == 4 ? "" : "AAC";
+            Json::Value& entry = expected["camera"].append(Json::Value());
+            entry["camera_id"] = id;
+            entry["event"].append(first);
+            entry["event"].append(second);
+            entry["total"] = 2U;
+            queries.push_back("EventListGetAll(0,-1,1000000,1000060," + std::to_string(id) + ",0,0," +
+                              (id == 1 ? "1" : "6") + ",camera_id)");
+        }
+        EXPECT_EQ(search.platform.calls.back(), "SetSuccess(" + Text(expected) + ")");
+        EXPECT_EQ(search.All("EventListGetAll"), queries);
     }
 }
 

@@ -49,17 +49,13 @@ void NoPictures(ScriptedPlatform& p) {
 
 const LoopRow kLoop[] = {
     {"newest picture behind its offset, then nothing newer",
-     [](auto& p) {
-         p.frames = {{{7, "xxAB", 2}}, {}, {{0, "C"}}};
-     },
+     Pictures({{{7, "xxAB", 2}}, {}, {{0, "C"}}}),
      {},
      Read(10001) + Write("AB") + kDone + Empty(7) + Read(7) + Write("C") + kDone + Empty(0) + Exit("1", "0", "0")},
     {"stopped", Stop, {}, Exit("0", "0", "1")},
     {"broken output", [](auto& p) { p.is_error = true; }, {}, Exit("0", "1", "0")},
     {"stopped while sending",
-     [](auto& p) {
-         p.frames = {{{1, "A"}}, {{2, "B"}}};
-     },
+     Pictures({{{1, "A"}}, {{2, "B"}}}),
      {{"fflush()", Stop}},
      Read(10001) + Write("A") + kDone + Exit("0", "0", "1")},
     {"paused, then on",
@@ -67,9 +63,7 @@ const LoopRow kLoop[] = {
      {{"sleep(10)", [](auto& p) { p.common_cfg.m_blPause = 0; }}},
      Sleeps(1) + Empty(10001) + Exit("1", "0", "0")},
     {"paused in mid-stream",
-     [](auto& p) {
-         p.frames = {{{1, "A"}}, {{2, "B"}}};
-     },
+     Pictures({{{1, "A"}}, {{2, "B"}}}),
      {{"usleep(10000)", [](auto& p) { p.common_cfg.m_blPause = 2; }}, {"sleep(10)", Stop}},
      Read(10001) + Write("A") + kDone + Sleeps(1) + Exit("0", "0", "1")},
     {"no service, then on",
@@ -118,9 +112,7 @@ const LoopRow kLoop[] = {
      Empty(10001) + Read(10001) + Write("A") + Calls{"log live/4 Failed to fflush data [Cam: 5, errno: 32]\n"} + kDone +
          Empty(3) + TimeOut(3) + Exit("0", "0", "0")},
     {"the time-out begins after the flush",
-     [](auto& p) {
-         p.frames = {{{1, "A"}}};
-     },
+     Pictures({{{1, "A"}}}),
      {{"fflush()", Later(21)}},
      Read(10001) + Write("A") + kDone + Empty(1) + Exit("1", "0", "0")},
 };

@@ -60,13 +60,13 @@ Calls Started(const std::string& data) {
                  "ReadIFrameFinish(entry,null)"};
 }
 
+Change Begins(const ScriptedFrame& newest, const ScriptedFrames& frames, const ScriptedFrames& audio = {}) {
+    return [=](ScriptedPlatform& p) { p.newest_key_frame = newest, p.frames = frames, p.audio_frames = audio; };
+}
+
 const LoopRow kRows[] = {
     {"begins with the newest key frame and forwards both media without a rest",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "K");
-         p.frames = {Delta(41, "d"), {}, Delta(0, "e")};
-         p.audio_frames = {Delta(8, "s"), Delta(9, "t")};
-     },
+     Begins(Key(40, "K"), {Delta(41, "d"), {}, Delta(0, "e")}, {Delta(8, "s"), Delta(9, "t")}),
      {},
      Started("K") + Video(40, WriteDelta("d")) + Audio(10001, WriteSound("s")) + Video(41, {}, "null") +
          Audio(8, WriteSound("t")) + Video(41, WriteDelta("e")) + Audio(9, {}, "null") + NothingNew(0, 9) + kRest +
@@ -80,26 +80,17 @@ const LoopRow kRows[] = {
      kNoStart + Video(10001, {}) + Audio(10001, {}) + kRest + Video(3, kUpdate + WriteKey("K")) +
          Audio(1, WriteSound("t")) + NothingNew(4, 2) + kRest + Exit("1", "0")},
     {"an empty start frame is none",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "");
-         p.frames = {Key(41, "K")};
-     },
+     Begins(Key(40, ""), {Key(41, "K")}),
      {},
      kOpen + Calls{"ReadIFrameFinish(entry,null)"} + Video(10001, kUpdate + WriteKey("K")) + Audio(10001, {}, "null") +
          NothingNew(41, 10001) + kRest + Exit("1", "0")},
     {"describes the stream as at its first key frame",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "K");
-         p.frames = {Key(41, "L")};
-     },
+     Begins(Key(40, "K"), {Key(41, "L")}),
      {{"ReadIFrameFinish(entry,null)", [](auto& p) { p.video_codec = p.audio_codec = p.video_extra = "other"; }}},
      Started("K") + Video(40, WriteKey("L")) + Audio(10001, {}, "null") + NothingNew(41, 10001) + kRest +
          Exit("1", "0")},
     {"stopped between picture and sound",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "K");
-         p.frames = {Delta(41, "d")};
-     },
+     Begins(Key(40, "K"), {Delta(41, "d")}),
      {{"ReadFinish(entry,1,position)", Stop}},
      Started("K") + Video(40, WriteDelta("d")) + Exit("0", "1")},
     {"stopped before the first pass", Stop, {}, kNoStart + Exit("0", "1")},
@@ -108,9 +99,7 @@ const LoopRow kRows[] = {
      {{"sleep(10)", [](auto& p) { p.common_cfg.m_blPause = 0; }}},
      kNoStart + Calls{"sleep(10)"} + NothingNew(10001, 10001) + kRest + Exit("1", "0")},
     {"dropped frames keep no stream alive",
-     [](auto& p) {
-         p.frames = {Delta(1, "d"), Delta(2, "d"), Delta(3, "d")};
-     },
+     Pictures({Delta(1, "d"), Delta(2, "d"), Delta(3, "d")}),
      {{"usleep(10000)", Later(20)}},
      kNoStart + Video(10001, {}) + Audio(10001, {}, "null") + kRest + Video(1, {}) + Audio(10001, {}, "null") + kRest +
          Video(2, {}) + Audio(10001, {}, "null") + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},

@@ -44,6 +44,9 @@ struct LoopRow {
 inline void Stop(ScriptedPlatform&) {
     gblStop = 1;
 }
+inline Change Pictures(const ScriptedFrames& frames) {
+    return [frames](ScriptedPlatform& p) { p.frames = frames; };
+}
 inline Change Later(int seconds) {
     return [seconds](ScriptedPlatform& p) { p.now += seconds; };
 }

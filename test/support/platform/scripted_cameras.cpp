@@ -14,6 +14,7 @@ using lookhaven::test::AudioRing;
 using lookhaven::test::Call;
 using lookhaven::test::Script;
 using lookhaven::test::ScriptedFrame;
+using lookhaven::test::ScriptedFrames;
 using lookhaven::test::Sound;
 
 namespace lookhaven::test {
@@ -157,7 +158,7 @@ DataEntry* Entry(const std::optional<ScriptedFrame>& frame) {
     return entry;
 }
 
-DataEntry* NextOf(std::deque<std::optional<ScriptedFrame>>& frames) {
+DataEntry* NextOf(ScriptedFrames& frames) {
     if (frames.empty()) {
         return nullptr;
     }

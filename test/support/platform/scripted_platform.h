@@ -47,6 +47,8 @@ struct ScriptedFrame {
     long long timestamp = 0;
 };
 
+using ScriptedFrames = std::deque<std::optional<ScriptedFrame>>;
+
 enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
 
 class ScriptedPlatform;
@@ -92,9 +94,9 @@ class ScriptedPlatform {
     std::map<int, Sound> sound;
 
     bool has_stream = true;
-    std::deque<std::optional<ScriptedFrame>> frames;  // after the last, standard output is at its end
+    ScriptedFrames frames;  // after the last, standard output is at its end
     bool has_audio_stream = true;
-    std::deque<std::optional<ScriptedFrame>> audio_frames;
+    ScriptedFrames audio_frames;
     std::optional<ScriptedFrame> newest_key_frame;
     std::string video_codec = "H264", audio_codec = "AAC", video_extra = "V", audio_extra = "A";
     std::map<const void*, std::string> positions = {{nullptr, "null"}};  // readers of a ring, with their names
