@@ -162,31 +162,29 @@ struct RejectedRow {
 
 TEST(EventSearch, Rejects) {
     const std::string uid = "Failed to load priv profile of Uid[7].\n", span = "Error time duration.\n";
+    const std::string forbidden = "Inaccessible camera group[6].\n", unknown = "Failed to load camera group[5].\n";
+    const char *profile = "PrivProfileGetByUid", *groups = "GetInaPrivPerCamGrpIdSet", *load = "CamGroup::Load";
+    const auto group = [](int id, int result) {
+        return [=](ScriptedPlatform& p) { p.params["camGrpId"] = id, p.group_result = result; };
+    };
     const RejectedRow both[] = {
-        {"no profile, and a forbidden group", [](auto& p) { p.profile_id = 0, p.params["camGrpId"] = 6; }, uid, 401,
-         "PrivProfileGetByUid"},
-        {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, "PrivProfileGetByUid"},
-        {"forbidden group", [](auto& p) { p.params["camGrpId"] = 6; }, "Inaccessible camera group[6].\n", 401,
-         "GetInaPrivPerCamGrpIdSet"},
-        {"forbidden group that is not there", [](auto& p) { p.params["camGrpId"] = 6, p.group_result = 1; },
-         "Inaccessible camera group[6].\n", 401, "GetInaPrivPerCamGrpIdSet"},
-        {"unknown group", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = 1; },
-         "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
-        {"a group that fails", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = -1; },
-         "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
-        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[68] = 0; }, "", 401, "PrivProfileGetByUid"},
+        {"no profile, and a forbidden group", Change(group(6, 0)) + [](auto& p) { p.profile_id = 0; }, uid, 401,
+         profile},
+        {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, profile},
+        {"forbidden group", group(6, 0), forbidden, 401, groups},
+        {"forbidden group that is not there", group(6, 1), forbidden, 401, groups},
+        {"unknown group", group(5, 1), unknown, 400, load},
+        {"a group that fails", group(5, -1), unknown, 400, load},
+        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[68] = 0; }, "", 401, profile},
     };
-    const auto from_to = [](int from, int to) {
-        return [=](ScriptedPlatform& p) { p.params["from"] = from, p.params["to"] = to; };
-    };
+    const auto from_to = [](int from, int to) { return Params({{"from", from}, {"to", to}}); };
     const RejectedRow only_events[] = {
-        {"no span", from_to(5, 5), span, 401, "PrivProfileGetByUid"},
-        {"negative span of nobody", [](auto& p) { p.params["to"] = 5, p.profile_id = 0; }, span, 401,
-         "PrivProfileGetByUid"},
+        {"no span", from_to(5, 5), span, 401, profile},
+        {"negative span of nobody", Params({{"to", 5}}) + [](auto& p) { p.profile_id = 0; }, span, 401, profile},
         {"32 days", from_to(0, 32 * kDay), "", 0, "FillRecLogMap"},
-        {"more than 32 days", from_to(0, 32 * kDay + 1), span, 401, "PrivProfileGetByUid"},
-        {"as long as can be", from_to(0, INT_MAX), span, 401, "PrivProfileGetByUid"},
-        {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, "PrivProfileGetByUid"},
+        {"more than 32 days", from_to(0, 32 * kDay + 1), span, 401, profile},
+        {"as long as can be", from_to(0, INT_MAX), span, 401, profile},
+        {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, profile},
         {"the last second", from_to(INT_MAX - 1, INT_MAX), "", 0, "FillRecLogMap"},
         {"over the wrap of time", from_to(INT_MAX, INT_MIN), "", 0, "FillRecLogMap"},
     };
@@ -341,14 +339,10 @@ TEST(EnumEvent, MarksCoverage) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         Search search("EnumEvent");
-        search.platform.params["from"] = row.from;
-        search.platform.params["to"] = row.to;
-        search.platform.params["interval"] = -3;
-        search.platform.params["cameralists"] = "2,4";
+        Params({{"from", row.from}, {"to", row.to}, {"interval", -3}, {"cameralists", "2,4"}})(search.platform);
         search.platform.found_events = {row.events.begin(), row.events.end()};
         search.platform.on_call = [&](const std::string& call) {
-            if (call.rfind("SetSuccess", 0) != 0 && call.rfind("EventListGetAll", 0) == 0 &&
-                call.find(",4,") != std::string::npos) {
+            if (call.rfind("EventListGetAll", 0) == 0 && call.find(",4,") != std::string::npos) {
                 search.platform.found_events.clear();
             }
         };

@@ -52,7 +52,7 @@ TEST(Playback, ReadsAndCallsInOrder) {
 }
 
 struct Outcome {
-    std::string log;
+    std::string log;  // function: text, "@" for the handler's function
     const char* answer;
     bool redirect;
     std::string pid_file = "none";
@@ -66,35 +66,43 @@ struct FailureRow {
 };
 
 TEST(Playback, FailuresHaveTheirAnswers) {
-    const Outcome bad = {"Invalid input\n", "401", true}, forgiven = {"Invalid input\n", "ok", true};
-    const Outcome signals = {"Failed to setup signal handler.\n", "400", false};
-    const Outcome silent = {"", "ok", true}, not_played = {"Failed to play event.\n", "ok", true};
-    const std::string unknown = "Failed to load event[3] on mount[0].\n", memory = "Alloc buffer failed!\n";
-    const Outcome no_session = {"Failed to get session ID.\n", "400", true};
-    const Outcome no_pid_file = {"Failed to write pid file.\n", "400", true};
+    const Outcome bad = {"@: Invalid input\n", "401", true}, forgiven = {"@: Invalid input\n", "ok", true};
+    const Outcome signals = {"@: Failed to setup signal handler.\n", "400", false};
+    const Outcome no_session = {"@: Failed to get session ID.\n", "400", true};
+    const Outcome no_pid_file = {"@: Failed to write pid file.\n", "400", true};
+    const Outcome silent = {"", "ok", true}, not_played = {"@: Failed to play event.\n", "ok", true};
+    const std::string on_mount = "Failed to load event[3] on mount[0].\n", memory = "StreamOut: Alloc buffer failed!\n";
+    const Outcome unknown = {"GetRecordedFilename: " + on_mount, "ok", true};
+    const Outcome unknown_not_played = {unknown.log + not_played.log, "ok", true};
+    const Change no_events = [](auto&p) { p.events.clear(); }, no_session_id = [](auto&p) { p.session_id = ""; };
+    const auto fails = [](int signal) { return [=](ScriptedPlatform& p) { p.failing_signals = {signal}; }; };
     const FailureRow rows[] = {
-        {"event 0, nor a signal", Params({{"eventid", 0}}) + [](auto& p) { p.failing_signals = {SIGTERM}; }, bad,
-         forgiven},
+        {"event 0, nor a signal", Params({{"eventid", 0}}) + fails(SIGTERM), bad, forgiven},
         {"negative start", Params({{"framestart", -1}, {"startTimeMS", -1}}), bad, forgiven},
-        {"start beyond 31 bits", Params({{"framestart", INT_MIN}, {"startTimeMS", Json::Int64{1} << 31}}), bad,
-         forgiven},
+        {"start of 32 bits", Params({{"framestart", INT_MIN}, {"startTimeMS", Json::Int64{1} << 31}}), bad, forgiven},
         {"no stream key", [](auto& p) { p.params.erase("timestamp"); }, bad, forgiven},
         {"negative stream key", Params({{"timestamp", -5}}), bad, forgiven},
-        {"SIGTERM", [](auto& p) { p.failing_signals = {SIGTERM}; }, signals, signals},
-        {"SIGUSR1", [](auto& p) { p.failing_signals = {SIGUSR1}; }, signals, signals},
-        {"SIGUSR2, nor a session", [](auto& p) { p.failing_signals = {SIGUSR2}, p.session_id = ""; }, signals, signals},
-        {"no session, nor an event", [](auto& p) { p.session_id = "", p.events.clear(); }, no_session, no_session},
+        {"SIGTERM", fails(SIGTERM), signals, signals},
+        {"SIGUSR1", fails(SIGUSR1), signals, signals},
+        {"SIGUSR2, nor a session", no_session_id + fails(SIGUSR2), signals, signals},
+        {"no session, nor an event", no_session_id + no_events, no_session, no_session},
         {"no place for a pid file, nor an event to flush",
-         [](auto& p) { p.session_id = kSession + "/x", p.events.clear(), p.params["flushHeader"] = 1; }, no_pid_file,
+         no_events + Params({{"flushHeader", 1}}) + [](auto& p) { p.session_id = kSession + "/x"; }, no_pid_file,
          no_pid_file},
-        {"unknown event",
-         [](auto& p) { p.events.clear(); },
-         {unknown, "ok", true},
-         {unknown + not_played.log, "ok", true}},
+        {"unknown event", no_events, unknown, unknown_not_played},
         {"unknown event to flush",
-         [](auto& p) { p.events.clear(), p.params["flushHeader"] = 1; },
-         {unknown, "ok", true},
-         {unknown, "400", false, std::to_string(getpid())}},
+         no_events + Params({{"flushHeader", 1}}),
+         unknown,
+         {"@: " + on_mount, "400", false, std::to_string(getpid())}},
+        {"unknown alert",
+         no_events + Params({{"recEvtType", 1}}),
+         {"GetAlertEventFilename: Failed to load event[3].\n", "ok", true},
+         unknown_not_played},
+        {"unknown POS event",
+         no_events + Params({{"recEvtType", 2}}),
+         {"GetPosEventFilename: Failed to load event[3].\n", "ok", true},
+         unknown_not_played},
+        {"quiet", no_events + [](auto& p) { p.log_cfg.m_CategLevel[68] = 0; }, silent, silent},
         {"nothing saved", [](auto& p) { p.events[3].m_blSaved = false; }, silent, not_played},
         {"no file", [](auto& p) { p.has_file = false; }, silent, not_played},
         {"no recording", [](auto& p) { p.init_result = -1; }, silent, not_played},
@@ -107,21 +115,22 @@ TEST(Playback, FailuresHaveTheirAnswers) {
         {"start past the end", Frames(2) + Params({{"framestart", 2}, {"startTimeMS", 20}}), silent, not_played},
         {"pid file lost",
          Nothing,
-         {"Fail to remove file. [" + kPidFile + "]\n", "ok", false},
-         {"Failed to remove pid file.\n", "ok", false},
+         {"@: Fail to remove file. [" + kPidFile + "]\n", "ok", false},
+         {"@: Failed to remove pid file.\n", "ok", false},
          [](auto&) { std::remove(kPidFile.c_str()); }},
     };
     for (const auto& row : rows) {
         for (const char* method : {kByIndex, kByTime}) {
             SCOPED_TRACE(std::string(method) + " " + row.name);
             const Outcome& expected = method == kByIndex ? row.by_index : row.by_time;
+            const char* handler = method == kByIndex ? "HandlePlayEvent" : "HandlePlayEventNoFrameId";
             Player player(method);
             row.before(player.platform);
             EXPECT_EQ(player.Run({{1, row.at_first_picture}}, 2), expected.redirect ? kRedirect : "");
             std::string text;
             for (const auto& log : player.platform.logs) {
                 EXPECT_EQ(log.file + " " + log.categ + log.level, "mjpegstreamer player1");
-                text += log.text;
+                text += (log.func == handler ? "@" : log.func) + ": " + log.text;
             }
             EXPECT_EQ(text, expected.log);
             const std::string answer = expected.answer;
@@ -130,35 +139,6 @@ TEST(Playback, FailuresHaveTheirAnswers) {
                                                : "SetError(" + answer + ",{\"param1\":\"\",\"param2\":\"\"})");
             EXPECT_EQ(PidFile(), expected.pid_file);
         }
-    }
-}
-
-TEST(Playback, LogLinesNameTheirFunctions) {
-    struct Row {
-        const char* method;
-        Change before;
-        std::vector<std::string> functions;
-    };
-    const auto lose = [](ScriptedPlatform& p) { p.events.clear(); };
-    const Row rows[] = {
-        {kByIndex, Params({{"eventid", 0}}), {"HandlePlayEvent"}},
-        {kByIndex, [](auto& p) { p.session_id = ""; }, {"HandlePlayEvent"}},
-        {kByTime, [](auto& p) { p.session_id = ""; }, {"HandlePlayEventNoFrameId"}},
-        {kByTime, lose, {"GetRecordedFilename", "HandlePlayEventNoFrameId"}},
-        {kByIndex, lose + Params({{"recEvtType", 1}}), {"GetAlertEventFilename"}},
-        {kByIndex, lose + Params({{"recEvtType", 2}}), {"GetPosEventFilename"}},
-        {kByIndex, [](auto& p) { p.has_memory = false; }, {"StreamOut"}},
-        {kByIndex, lose + [](auto& p) { p.log_cfg.m_CategLevel[68] = 0; }, {}},
-    };
-    for (const auto& row : rows) {
-        Player player(row.method);
-        row.before(player.platform);
-        player.Run({}, 1);
-        std::vector<std::string> functions;
-        for (const auto& log : player.platform.logs) {
-            functions.push_back(log.func);
-        }
-        EXPECT_EQ(functions, row.functions);
     }
 }
 

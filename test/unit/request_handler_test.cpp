@@ -32,6 +32,8 @@ struct ProbeHandler : LHHandlerBase<ProbeHandler> {
 };
 
 const Calls kSession = {"IsAuthorized()", "HasAppPriv(VEXO.VDX.Lookhaven)", "IsAdmin()", "GetLoginUserName()"};
+const Calls kAppPriv = {kSession.begin(), kSession.begin() + 2};
+const Calls kAdmin = {kSession.begin(), kSession.begin() + 3};
 const Calls kPeer = {"IsLHRunning()", "GetParam(isCrossSite,0)", "GetParam(client,\"\")"};
 const Calls kPair = {"GetParam(cookie,\"FailedCookie\")", "GetCookie(timestamp,FailedTiemstamp)"};
 const Calls kNoSession = {"IsAuthorized()"};
@@ -54,14 +56,8 @@ void AsPeer(ScriptedPlatform& p, const char* client) {
 }
 
 const AdmissionRow kAdmission[] = {
-    {"application privilege",
-     [](auto& p) { p.is_authorized = p.has_app_priv = true; },
-     true,
-     {kSession.begin(), kSession.begin() + 2}},
-    {"administrator",
-     [](auto& p) { p.is_authorized = p.is_admin = true; },
-     true,
-     {kSession.begin(), kSession.begin() + 3}},
+    {"application privilege", [](auto& p) { p.is_authorized = p.has_app_priv = true; }, true, kAppPriv},
+    {"administrator", [](auto& p) { p.is_authorized = p.is_admin = true; }, true, kAdmin},
     {"the service's own account", [](auto& p) { p.is_authorized = true, p.user_name = "Lookhaven"; }, true, kSession},
     {"the user's privilege", [](auto& p) { p.is_authorized = p.has_user_priv = true; }, true,
      kSession + UserPriv("eve")},

@@ -110,9 +110,6 @@ inline Change ClientSets(int number) {
 inline Change Signal(int signal) {
     return [signal](ScriptedPlatform&) { std::raise(signal); };
 }
-inline Change operator+(const Change& first, const Change& second) {
-    return [=](ScriptedPlatform& p) { first(p), second(p); };
-}
 
 inline const Calls kSignals = {"sigaction(15,0,no mask)", "sigaction(10,0,no mask)", "sigaction(12,0,no mask)"};
 inline const Calls kOpen = {"Event::Load(3,0,0,0)", "IsFileExist(/rec/3)", "ProgressIndicator(5,1,1)",

@@ -146,6 +146,9 @@ inline Change Params(const std::map<std::string, Json::Value>& params) {
         }
     };
 }
+inline Change operator+(const Change& first, const Change& second) {
+    return [=](ScriptedPlatform& p) { first(p), second(p); };
+}
 
 // The address that stands for an audio ring.
 ShmStreamFifo* AudioRing();
