@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Joins numbers into one text, as the platform takes lists of ids.
+// Joins numbers into one text, the form in which the platform takes lists of ids.
 #pragma once
 
 #include <string>

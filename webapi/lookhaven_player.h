@@ -11,7 +11,8 @@
 
 extern "C" {
 
-// Serves one request. Exceptions of the platform and of JSON conversions pass through.
+// Serves one request. Exceptions of the platform and of JSON conversions pass through. The answer may be on standard
+// output already when it returns.
 using APIProcess = void (*)(VEXO::APIRequest* request, VEXO::APIResponse* response);
 
 // Four machine words; a row of zeros ends a table.
@@ -24,7 +25,7 @@ struct APIRow {
 static_assert(sizeof(APIRow) == 4 * sizeof(void*), "the framework walks rows of four words");
 
 LH_PLATFORM_API extern const APIRow gTable[];
-// gTable, and nothing else happens.
+// Returns gTable; has no side effects.
 LH_PLATFORM_API const APIRow* GetAPITable();
 
 LH_PLATFORM_API void Process(VEXO::APIRequest* request, VEXO::APIResponse* response);

@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Records of a request that a managing host relays to its recording servers.
+// Records of a request that a managing host relays to its recording servers. The module only names them in the types of
+// its handlers: it never fills one, so nobody needs to define them.
 #pragma once
 
-// What to relay. The module names the type in its handlers' identity and never fills one.
+// The request to relay.
 struct CmsRelayParams;
 
-// Whom to relay to. As above.
+// The server to relay it to.
 struct CmsRelayTarget;

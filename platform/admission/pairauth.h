@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Admission beside the login session: application privileges, and peers that present a cookie pair.
+// Admission without a privilege of the login session: the user's application privilege, and peers with a cookie pair.
 #pragma once
 
 #include <string>
@@ -14,11 +14,11 @@ class LH_PLATFORM_API SDKUser {
                                const std::string& remoteIp);
 };
 
-// True when cookie answers timestamp under the secret that this host shares with a peer. Missing values arrive as
-// placeholder texts and must not match.
+// True when cookie is the right answer to timestamp under the secret that this host shares with a peer. The module
+// passes non-empty placeholders for missing values, which must not match.
 LH_PLATFORM_API bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp);
 
-// The pair matching of a recording server for requests that come across sites, from its managing host.
+// Pair matching on a recording server, for cross-site requests from its managing host.
 class LH_PLATFORM_API SlaveHxAuthentication {
   public:
     SlaveHxAuthentication();

@@ -16,7 +16,8 @@ class LH_PLATFORM_API SlaveHx {
 
     std::string GetIP() const;
     int GetPort() const;
-    // A short-lived token with which a client may ask the server; never the secret that this host shares with it.
+    // A short-lived token for requests of a client to the server, never the secret that this host shares with it; empty
+    // when the caller may not have one.
     std::string GetCookie() const;
 
   private:
@@ -27,9 +28,10 @@ class LH_PLATFORM_API SlaveHx {
 
 class LH_PLATFORM_API SlaveHxMgr {
   public:
-    // load: reads the servers now.
+    // load: reads the servers now; otherwise there are none.
     explicit SlaveHxMgr(bool load);
-    // The servers by id. Each flag narrows: to those that answer, that are enabled, that are of this host's own version.
+    // The servers by id. Each flag leaves out servers: those that do not answer, that are disabled, that run another
+    // version than this host.
     std::map<int, SlaveHx> GetSlaveHxMap(bool onlyOnline, bool onlyEnabled, bool onlySameVersion) const;
 
   private:

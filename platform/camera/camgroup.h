@@ -16,13 +16,13 @@ class LH_PLATFORM_API CamGroup {
 
     // Returns 0, or non-zero when there is no such group; then the record is unchanged.
     int Load(int groupId);
-    // The group's cameras by id, without those that the caller may not play back.
+    // The group's cameras by id, without those that the caller may not play back: the module does not filter them.
     std::map<int, Camera> GetCamMap() const;
 
   private:
     int m_Id;
 };
 
-// The cameras that have recordings on the mount or record on it, by id; mount 0: every camera. deniedIds: ids to leave
-// out, decimal, ascending, joined by ",". withDeleted adds removed cameras whose recordings remain.
+// The cameras that record or have recordings on the mount, by id; mount 0: every camera. deniedIds: ids to leave out,
+// decimal, ascending, joined by ",". withDeleted adds removed cameras whose recordings remain.
 LH_PLATFORM_API std::map<int, Camera> GetCamMountMap(int mountId, const std::string& deniedIds, bool withDeleted);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a camera's device is able to do.
+// Capabilities of camera devices.
 #pragma once
 
 #include <memory>
@@ -17,11 +17,11 @@ class LH_PLATFORM_API DevCapHandler {
     DevCapHandler(const DevCapHandler&) = delete;
     DevCapHandler& operator=(const DevCapHandler&) = delete;
 
-    // Loads the capabilities of the camera's device from the record, never from the device itself. Returns 0, or
-    // non-zero when they are unknown.
+    // Loads the capabilities from the camera's record, never from the device itself. Returns 0, or non-zero when they
+    // are unknown; one such camera fails the whole camera list.
     int LoadByCam(const Camera& camera);
 
-    // Non-zero when the device sends sound. Its target and functor are owned by this handler.
+    // Non-zero when the device has sound. Usable after LoadByCam; this handler owns its target and functor.
     CapFunctor<unsigned int> m_SoundSupport;
 
   private:
@@ -31,7 +31,8 @@ class LH_PLATFORM_API DevCapHandler {
 
 class LH_PLATFORM_API CamCapUtils {
   public:
-    // The PTZ abilities that the user may use on the camera's live stream, as bits; 0 for none.
+    // The PTZ capabilities that the user may use on the camera's live stream, as bits that go to the client; 0 for
+    // none.
     static unsigned int GetLiveStmPtzCapByUserName(const DevCapHandler& devCap, const Camera& camera,
                                                    const std::string& userName);
 };

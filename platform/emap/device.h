@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Devices on e-maps beside cameras, the ports of devices, and the ids that this host gives to devices of its recording
-// servers.
+// Devices on e-maps other than cameras, the ports of devices, and the local ids of devices of recording servers.
 #pragma once
 
 #include <map>
@@ -9,10 +8,11 @@
 
 #include "platform/export.h"
 
-// A box of inputs and outputs. A record is a value.
+// A module with digital input and output ports. A record is a value.
 class LH_PLATFORM_API IOModule {
   public:
-    // Each returns 0, or non-zero when there is no such module; then the record is unchanged.
+    // Each returns 0, or non-zero when there is no such module; then the record is unchanged. Load takes this host's
+    // own modules only. Rights are not checked.
     int Load(int moduleId);
     int LoadByIdOnRecServer(int idOnServer, int serverId);
     // The module's id on this host.
@@ -24,13 +24,13 @@ class LH_PLATFORM_API IOModule {
     std::string m_Name;
 };
 
-// A till. A record is a value.
+// A point-of-sale terminal. A record is a value.
 class LH_PLATFORM_API POS {
   public:
     // As those of IOModule.
     int Load(int posId);
     int LoadByIdOnRecServer(int idOnServer, int serverId);
-    // The camera that watches the till, by its id on the till's own server; 0 for none.
+    // The camera paired with the terminal, by its id on the terminal's own server; 0 for none.
     int GetPairedCamIdOnRec() const;
 
   private:
@@ -61,14 +61,14 @@ class LH_PLATFORM_API CamDeviceOutput {
 class LH_PLATFORM_API IOModuleSetting {
   public:
     explicit IOModuleSetting(std::map<int, int> types = {}) : m_Types(std::move(types)) {}
-    // Adds the type of each port under its index.
+    // Adds the port types by port index (3 input, 1 output); entries that types already has are kept.
     void GetType(std::map<int, int>& types) const { types.insert(m_Types.begin(), m_Types.end()); }
 
   private:
     std::map<int, int> m_Types;
 };
 
-// By the device's id on this host. ids: decimal, ascending, joined by ",".
+// By the device's id on this host. ids: decimal, ascending, joined by ",". A device without settings may be missing.
 LH_PLATFORM_API std::map<int, CamDetSetting> GetCamDetMap(const std::string& ids);
 LH_PLATFORM_API std::map<int, CamDeviceOutput> GetCamDOMap(const std::string& ids);
 LH_PLATFORM_API std::map<int, IOModuleSetting> GetIOModuleSettingMap(const std::string& ids);
@@ -77,5 +77,6 @@ LH_PLATFORM_API std::map<int, IOModuleSetting> GetIOModuleSettingMap(const std::
 LH_PLATFORM_API int GetCamIdOnHost(int serverId, int idOnServer);
 LH_PLATFORM_API int GetIOModuleIdOnHost(int serverId, int idOnServer);
 
-// The camera that watches the module's port: its id on this host, its recording server and its id there; all 0 for none.
+// The camera paired with the module's port: its id on this host, its recording server (0: this host) and its id there.
+// Without one all are 0 or left alone, so the caller sets them to 0 first.
 LH_PLATFORM_API void GetPairedCam(int moduleId, int portIdx, int& camId, int& camServerId, int& camIdOnServer);

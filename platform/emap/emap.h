@@ -8,7 +8,7 @@
 
 #include "platform/export.h"
 
-// What an item stands for; others exist that the module does not show.
+// The kinds of items that the module shows; it skips all others.
 enum EMAP_ITEM_TYPE : int {
     EMAP_ITEM_CAMERA = 0,
     EMAP_ITEM_EMAP = 1,  // a link to another e-map
@@ -19,16 +19,16 @@ enum EMAP_ITEM_TYPE : int {
 
 struct __tag_EMAP_ITEM_INFO {
     int m_Type = 0;  // EMAP_ITEM_TYPE
-    int m_Id = 0;    // of the device on its own server
+    int m_Id = 0;    // the device's id on its own server
     std::string m_Name;
     int m_HxId = 0;  // the recording server that owns the device; 0: this host
-    int m_X = 0;     // pixels of the picture
+    int m_X = 0;     // in pixels of the picture
     int m_Y = 0;
     int m_Direction = 0;
-    int m_TextPos = 0;  // where the name stands
+    int m_TextPos = 0;  // placement of the name
     int m_IconCenterX = 0;
     int m_IconCenterY = 0;
-    int m_PortIdx = 0;  // of the device's input or output
+    int m_PortIdx = 0;  // the device's input or output, from 0; below 0 for none
 };
 
 class LH_PLATFORM_API Emap {
@@ -46,7 +46,7 @@ class LH_PLATFORM_API Emap {
     int GetItemNum() const;
     // Returns 0, or non-zero when there is no item at the index; then the item is unchanged.
     int GetItem(int index, __tag_EMAP_ITEM_INFO& item) const;
-    // Names are not shown beside the items.
+    // How the client draws the items: without their names, small.
     bool GetHideItemName() const;
     bool GetSmallItemSize() const;
 
@@ -56,5 +56,6 @@ class LH_PLATFORM_API Emap {
     std::unique_ptr<Record> m_pRecord;
 };
 
-// The picture's file in base64; length: the number of its characters. Empty, with length 0, when it cannot be read.
+// The picture's file in base64; length: the number of base64 characters. Empty, with length 0, when it cannot be read,
+// which fails no request. imageName: a name from Emap::GetImgName.
 LH_PLATFORM_API std::string LoadEmapImgBase64String(const std::string& imageName, int& length);

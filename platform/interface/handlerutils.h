@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Runs the capability functors that a device registers by function id, and says so when one is missing or has another
-// type than its caller expects.
+// Calls the capability functors that a device registers, and logs when one is missing or has another type than its
+// caller expects.
 #pragma once
 
 #include <string>
@@ -15,16 +15,16 @@ class LH_PLATFORM_API DPObjectBase {
     virtual ~DPObjectBase();
 };
 
-// A registered functor whose type the holder has forgotten.
+// Base of registered functors; what a functor takes and returns is only known at run time.
 class LH_PLATFORM_API MemFuncBase {
   public:
     virtual ~MemFuncBase();
 };
 
-// Stands for an argument that a functor does not take.
+// Placeholder for an unused argument.
 struct NoneT {};
 
-// A member call with up to seven arguments; NoneT fills the places behind the last.
+// A member call with up to seven arguments; unused ones are NoneT.
 template <typename R, typename A1, typename A2, typename A3, typename A4, typename A5, typename A6, typename A7>
 class LH_PLATFORM_API MemFuncInterface;
 
@@ -35,14 +35,14 @@ class LH_PLATFORM_API MemFuncInterface<R, NoneT, NoneT, NoneT, NoneT, NoneT, Non
     virtual R operator()(DPObjectBase& target) = 0;
 };
 
-// A functor without arguments together with the object to call it on. Owns neither.
+// A functor without arguments and the object to call it on. Owns neither.
 template <typename R>
 struct CapFunctor {
     DPObjectBase* m_pTarget = nullptr;
     MemFuncBase* m_pFunctor = nullptr;
     std::string m_Name;
 
-    // The functor's result, or R() after a log line when it cannot be run.
+    // The functor's result; R() after a log line when it cannot be called.
     R operator()() const {
         if (m_pTarget == nullptr) {
             LHPrintf(LOG_TYPE(0), nullptr, nullptr, "interface/handlerutils", 541, "operator()",

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The debug-log configuration that another process keeps in shared memory.
+// The debug-log configuration, which another process maintains in shared memory: any value may change between two
+// reads.
 #pragma once
 
 #include <cstddef>
@@ -17,7 +18,7 @@ struct DbgLogPidLevel {
     std::int32_t m_Level;
 };
 
-// A level is admitted when it is not above the threshold.
+// A level is admitted when it is not above the threshold. m_CategLevel is indexed by LOG_CATEG.
 struct DbgLogCfg {
     std::int32_t m_Version;
     std::int32_t m_CategLevel[DBG_LOG_CATEG_COUNT];

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a user may not see, and how much the user may do.
+// What a user may not access, and the user's privilege level.
 #pragma once
 
 #include <memory>
@@ -10,19 +10,19 @@
 
 #include "platform/export.h"
 
-// The kind of access to a camera that is asked about.
+// Kinds of access to a camera.
 enum CAM_PRIV_TYPE : int {
     CAM_PRIV_LIVEVIEW = 1,
     CAM_PRIV_PLAYBACK = 2,
     CAM_PRIV_AUDIO = 8,
 };
 
-// The kind of access to an e-map that is asked about.
+// Kinds of access to an e-map.
 enum ITEM_PRIV_TYPE : int {
     ITEM_PRIV_VIEW = 2,
 };
 
-// The kind of access to a door that is asked about.
+// Kinds of access to a door.
 enum DOOR_PRIV_TYPE : int {
     DOOR_PRIV_VIEW = 1,
 };
@@ -36,7 +36,7 @@ class LH_PLATFORM_API PrivProfile {
     // The platform's own data behind a profile.
     struct Data;
 
-    // A profile of nobody: GetId() is 0.
+    // An empty profile: GetId() is 0. Its sets must not be asked for.
     PrivProfile();
     explicit PrivProfile(std::shared_ptr<const Data> data);
 
@@ -44,23 +44,24 @@ class LH_PLATFORM_API PrivProfile {
     int GetId() const;
     // 0 and 1 manage the host; larger numbers do not.
     int GetPrivilege() const;
-    // The ids of cameras to which the user lacks the kind of access. withHidden: also those that the user's lists hide
-    // although they exist (cameras of removed groups).
+    // The ids of cameras to which the user lacks the kind of access. withHidden: also existing cameras that the user's
+    // lists hide, as those of removed groups. Each set throws when it cannot be read: an empty one would deny nothing.
     std::set<int> GetInaCamIdSet(CAM_PRIV_TYPE type, bool withHidden) const;
     // The ids of camera groups to which the user lacks the kind of access (a CAM_PRIV_TYPE).
     std::set<int> GetInaPrivPerCamGrpIdSet(int type) const;
     // The ids of e-maps and of I/O modules that the user may not see. withHidden as above.
     std::set<int> GetInaEmapIdSet(ITEM_PRIV_TYPE type, bool withHidden) const;
     std::set<int> GetInaIOIdSet(bool withHidden) const;
-    // Narrows the profile by the rights that a relaying host sends along; null changes nothing. Never widens it.
+    // Restricts the profile to the rights that a relaying host sends along; null changes nothing. Never adds a right,
+    // whatever the client sent.
     void UpdateByJson(const Json::Value& privData);
 
   private:
     std::shared_ptr<const Data> m_pData;
 };
 
-// The profile of the user, read afresh. PAIR_AUTH_UID gives a peer's profile, which denies nothing. For an unknown user
-// the result's GetId() is 0.
+// The user's profile, read from the store on each call. PAIR_AUTH_UID gives the profile of a peer, which denies
+// nothing. For an unknown user the result's GetId() is 0.
 LH_PLATFORM_API PrivProfile PrivProfileGetByUid(unsigned int uid);
 
 // True when the profile gives the kind of access to the door.

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recorded events: one stretch of a camera's recording, or the footage that an alarm or a till points at.
+// Recorded events: one section of a camera's recording, or the footage of an alert or of a POS transaction.
 #pragma once
 
 #include <cstdint>
@@ -33,16 +33,16 @@ class LH_PLATFORM_API Event {
     // Returns 0, or non-zero when there is no such event or the caller may not see it; then the record is unchanged.
     int Load(int eventId, int mountId, int serverId, int archiveId);
 
-    // There is footage on a mount.
+    // True when the event has footage on a mount.
     bool IsSaved() const;
     // The file to open for playback; empty when nothing is saved.
     std::string GetFullPath() const;
 
     int GetId() const;
     int GetIdOnRecServer() const;  // 0 for an event of this host
-    std::string GetPath() const;   // as it is shown: relative to the mount
+    std::string GetPath() const;   // for display: relative to the mount
     int GetStartTm() const;        // seconds since the epoch (UTC)
-    int GetEndTm() const;          // likewise; of an event that grows, its last second on the mount
+    int GetEndTm() const;          // the same; of a growing event the last second on the mount, never 0
     int GetFrameCount() const;
     int GetVdoType() const;         // CAM_VIDEO_TYPE
     int GetRecMethod() const;       // REC_METHOD
@@ -50,9 +50,9 @@ class LH_PLATFORM_API Event {
     int GetImgW() const;            // pixels
     int GetImgH() const;
     bool GetRecording() const;      // still being written
-    bool GetArchived() const;       // kept apart from retention
+    bool GetArchived() const;       // exempt from retention
     std::uint64_t GetSize() const;  // bytes
-    bool IsOriginalView() const;    // a fisheye camera's picture as it came
+    bool IsOriginalView() const;    // a fisheye camera's picture, not dewarped
 
     int m_Id;
     int m_CamId;
@@ -72,19 +72,19 @@ class LH_PLATFORM_API Event {
     std::string m_AudFmt;
 };
 
-// An alarm, reported by a device or an analytics box; its footage is a span of recorded events.
+// An alert of a device or of video analytics; its footage is a span of recorded events.
 class LH_PLATFORM_API AlertEvent : public Event {
   public:
-    // As Event::Load; alerts are not bound to a mount, so mountId is 0.
+    // As Event::Load; mountId is 0, since alerts are not bound to a mount.
     int Load(int eventId, int mountId, int serverId, int archiveId);
 };
 
-// A sale, reported by a till; its footage is a span of recorded events.
+// A transaction of a POS terminal; its footage is a span of recorded events.
 class LH_PLATFORM_API PosEvent {
   public:
     PosEvent();
 
-    // As Event::Load; sales are not bound to a mount, so mountId is 0.
+    // As Event::Load; mountId is 0, since transactions are not bound to a mount.
     int Load(int eventId, int mountId, int serverId, int archiveId);
     bool IsSaved() const;
     std::string GetFullPath() const;
@@ -93,9 +93,9 @@ class LH_PLATFORM_API PosEvent {
     Event m_Footage;
 };
 
-// Makes what was recorded of the event up to now playable; asks the recording service and waits a bounded time. Returns
-// 0, or non-zero when the service did not do it.
+// Makes the part of a growing event that has been recorded so far playable: asks the recording service and waits a
+// bounded time. Returns 0, or non-zero when the service failed; the module plays what there is either way.
 LH_PLATFORM_API int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type);
 
-// Something lies at the path.
+// True when the path exists, whatever it is; false for the empty path.
 LH_PLATFORM_API bool IsFileExist(const std::string& path);

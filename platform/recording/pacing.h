@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The pace of a playback: its clock, and the channel on which a client changes it or follows it.
+// Playback pacing: its clock, and the channel on which a client changes the rate or follows the position.
 #pragma once
 
 #include <cstdint>
@@ -8,17 +8,18 @@
 
 #include "platform/export.h"
 
-// Waits out what is left of each period, measured from an absolute start, so that errors do not add up.
+// Waits for the end of each period, measured from an absolute start, so that errors do not accumulate.
 class LH_PLATFORM_API DelayTimer {
   public:
     // The period in microseconds; taken as 1 ms … 10 s.
     explicit DelayTimer(int delayUs);
 
-    // The next period is as long as this; the start of the running one stays.
+    // Changes the length of the running period and of those after it; the start of the running one stays.
     void SetDelayTime(int delayUs);
     // The first period starts now.
     void BeginTiming();
-    // Returns when the running period is over, or at a signal. More than one period late, the next starts now.
+    // Returns at the end of the running period, or at a signal. When more than one period late it returns at once and
+    // the next period starts now: lost time is not made up.
     void Delay();
 
   private:
@@ -27,18 +28,19 @@ class LH_PLATFORM_API DelayTimer {
 };
 
 // One number that a player and its client share under the client's stream key: the play rate, or the position in
-// milliseconds. The key belongs to the session that used it first; another session's is refused.
+// milliseconds. A key belongs to the session that used it first; access by another session is refused.
 class LH_PLATFORM_API ProgressIndicator {
   public:
-    // create: makes the channel when it is missing. owner: it is this process's; what an earlier player left is cleared.
+    // create: makes the channel if it is missing. owner: takes it over and clears the value that an earlier player
+    // left. A refusal or failure shows in Set and Get only.
     ProgressIndicator(long long key, bool create, bool owner);
     ProgressIndicator(const ProgressIndicator&) = delete;
     ProgressIndicator& operator=(const ProgressIndicator&) = delete;
     ~ProgressIndicator();
 
-    // Publishes the number. Returns 0; non-zero when the channel is gone or refused, which it stays.
+    // Publishes the number. Returns 0; non-zero when the channel is gone or refused, for good.
     int Set(int value);
-    // The number, -1 when there is none or the channel is refused.
+    // The number; -1 when there is none, or the channel is gone or refused.
     int Get();
 
   private:

@@ -21,17 +21,18 @@ class LH_PLATFORM_API APIRequest {
     // Borrows context, which outlives the request.
     explicit APIRequest(Context& context);
 
-    // The parameter, or defaultValue when the request does not carry it. The empty name gives all parameters as one
-    // object, without secrets.
+    // The parameter, or defaultValue when the request does not carry it. Its JSON type is the client's choice, so that
+    // conversions of the result may throw Json::Exception; a text default such as "-1" may come back as a number. The
+    // empty name gives all parameters as one object, without secrets.
     Json::Value GetParam(const std::string& name, const Json::Value& defaultValue) const;
 
     // The method that the request names, as sent; empty when it names none.
     std::string GetAPIMethod() const;
 
-    // The login of the caller; 0 and empty texts without a session.
+    // The caller's login; 0 and empty texts without a session.
     unsigned int GetLoginUID() const;
     std::string GetLoginUserName() const;
-    // A public handle of the login session, fit for a file name; never the secret that the browser holds.
+    // A public handle of the login session that can be part of a file name; never the secret that the browser holds.
     std::string GetSessionID() const;
 
     // The caller's address as text.

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The answer that a handler gives back to the web API framework.
+// The answer that a handler returns to the web API framework.
 #pragma once
 
 #include <json/json.h>
@@ -9,7 +9,8 @@
 
 namespace VEXO {
 
-// The last of SetSuccess and SetError counts. A handler that calls neither leaves the answer to the framework.
+// Nothing is written before the entry function returns. The last of SetSuccess and SetError counts; a handler that
+// calls neither leaves the answer to the framework.
 //
 // Thread safety: one thread.
 class LH_PLATFORM_API APIResponse {
@@ -23,7 +24,7 @@ class LH_PLATFORM_API APIResponse {
     void SetSuccess(const Json::Value& data);
     // The JSON answer {"success": false, "error": {"code": code, "data": data}}.
     void SetError(int code, const Json::Value& data);
-    // false: the handler wrote its own bytes to standard output, and the framework adds nothing behind them.
+    // false: the handler has written its own bytes to standard output, and the framework adds nothing to them.
     void SetEnableOutput(bool enable);
 
   private:

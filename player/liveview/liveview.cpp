@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The cameras that a client may watch, with what it needs to open each of them.
+// The list of cameras that a client may watch, with what it needs to open each of them.
 #include "player/liveview/liveview.h"
 
 #include <list>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The cameras that a client may watch, with what it needs to open each of them.
+// The list of cameras that a client may watch, with what it needs to open each of them.
 #pragma once
 
 #include "webapi/include/lhwebapihandler.h"
@@ -13,7 +13,7 @@ class LiveviewHandler : public LHHandlerBase<LiveviewHandler> {
     void HandleProcess();
     // Returns 0, or -1 after a log line, with the response left alone.
     int HandleLiveviewLoad();
-    // Answers with the cameras that uid may watch. camId: the camera to select, 0 for the first that a browser can show.
-    // Returns 0, or -1 after a log line, with the response left alone.
+    // Answers with the cameras that uid may watch. camId: the camera to select, listed or not; 0 for the first enabled
+    // MJPEG camera. Returns 0, or -1 after a log line, with the response left alone.
     int SendCamerasData(int camId, unsigned int uid, bool showAll);
 };

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The items of an e-map as a client gets them.
+// Describes, filters and orders the items of an e-map.
 #include "player/liveview_src/emap_items.h"
 
 #include <set>
@@ -12,7 +12,7 @@
 
 namespace {
 
-// The function whose log lines these are.
+// The function that the log lines name.
 constexpr char kFunc[] = "LiveviewEmap";
 
 enum PortType { kPortNone = 0, kPortOutput = 1, kPortInput = 3 };
@@ -26,7 +26,7 @@ std::string Join(const std::set<int>& ids) {
     return Iter2String(ids.begin(), ids.end(), ",");
 }
 
-// What the map holds under the id, a fresh record when it holds none.
+// The record of the id; a default-constructed one if the map has none.
 template <typename Record>
 Record Find(const std::map<int, Record>& records, int id) {
     const auto found = records.find(id);
@@ -102,7 +102,7 @@ Json::Value EmapItems::Describe(const __tag_EMAP_ITEM_INFO& item) const {
     } else {
         description["hxIP"] = "";
         description["hxCookie"] = "";
-        // A number where a known server's is a text: the clients tell them apart by that.
+        // A number here, a text for a known server: clients tell the two apart by the type.
         description["hxPort"] = 0;
     }
     description["x"] = std::to_string(item.m_X);

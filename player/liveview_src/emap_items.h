@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The items of an e-map as a client gets them: with what their devices' records tell, without those that the user may not
-// see, ordered by kind and device.
+// The items of an e-map as a client gets them: completed from their devices' records, without those that the user may
+// not access, ordered by kind and device.
 #pragma once
 
 #include <map>
@@ -16,16 +16,18 @@
 
 class EmapItems {
   public:
-    // profile: decides about doors. servers: the recording servers of a managing host, by id.
+    // profile: decides which doors are shown. servers: the recording servers of a managing host, by id.
     EmapItems(PrivProfile profile, std::map<int, SlaveHx> servers)
         : m_Profile(std::move(profile)),
           m_Servers(std::move(servers)) {}
 
-    // Takes all items. A device that cannot be loaded costs its item and a log line.
+    // Adds all items. An item whose device cannot be loaded is skipped after a log line.
     void Add(const Emap& emap);
-    // Drops the cameras, links and I/O modules that the user may not see. A peer admitted by pair matching sees all.
+    // Removes the cameras, links and I/O modules that the user may not access. A peer admitted by pair matching gets
+    // all.
     void Filter(unsigned int uid);
-    // Cameras, links, doors, I/O modules, tills; each kind by ascending id, the items of one device in e-map order.
+    // Cameras, links, doors, I/O modules, POS terminals; each kind by ascending id, the items of a device in e-map
+    // order.
     Json::Value List() const;
 
   private:
@@ -41,6 +43,6 @@ class EmapItems {
     std::map<int, CamDetSetting> m_Inputs;
     std::map<int, CamDeviceOutput> m_Outputs;
     std::map<int, IOModuleSetting> m_IOSettings;
-    // By device id: an array of items, for links and doors the one item.
+    // By device id: an array of items, or the single item of a link or door.
     std::map<int, Json::Value> m_Cameras, m_Links, m_Doors, m_IOModules, m_Pos;
 };

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the loops of all live streams have in common: when a pass may begin, how long a stream may stand still.
+// Common to the loops of all live streams: when a pass may begin, how long a stream may stall.
 #include "player/liveview_src/live_loop.h"
 
 #include <cerrno>
@@ -26,7 +26,7 @@ std::uint64_t Distance(std::int64_t a, std::int64_t b) {
                  : static_cast<std::uint64_t>(b) - static_cast<std::uint64_t>(a);
 }
 
-// True when the recording service is there, has spoken lately, and does not say pause.
+// True when the recording service has refreshed its record within a day and does not ask for a pause.
 bool MayStream() {
     LHShmCommonCfg* cfg = LHShmCommonCfgAt();
     if (cfg == nullptr) {
@@ -35,7 +35,7 @@ bool MayStream() {
     const std::int64_t now = GetMonoTimeSec();
     const int locked = pthread_mutex_lock(&cfg->m_Mutex);
     if (locked == EOWNERDEAD) {
-        // Whoever died in there wrote plain numbers: each of them is whole.
+        // The owner that died stores single numbers only, none of which can be half written.
         pthread_mutex_consistent(&cfg->m_Mutex);
     } else if (locked == EDEADLK) {
         throw std::runtime_error("Potential self-deadlock detected!");

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Chooses what a live view request gets, and arms the stop flag.
+// Chooses the output of a live view request, and installs the handlers that set the stop flag.
 #include "player/liveview_src/liveview_src.h"
 
 #include <csignal>

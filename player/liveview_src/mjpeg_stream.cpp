@@ -2,9 +2,9 @@
 //
 // A camera's MJPEG picture: once, or as an endless multipart stream.
 //
-// Why so        Pictures go from shared memory to the output without a copy, and only the newest is sent, so that a slow
-//               client skips pictures and never falls behind. On early ways out the segment stays attached: the process
-//               ends with the request.
+// Why so        Pictures go from shared memory to the output without a copy, and only the newest is sent, so that a
+//               slow client skips pictures and never falls behind. On early returns the segment stays attached: the
+//               process ends with the request.
 #include <cstdio>
 
 #include <sys/shm.h>

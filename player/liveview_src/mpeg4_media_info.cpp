@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Asks the rings of a stream for its description.
+// Reads the description of a stream from its rings.
 #include "player/liveview_src/mpeg4_media_info.h"
 
 void Mpeg4MediaInfo::Update(ShmStreamFifo* video, ShmStreamFifo* audio) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every part of a muxed live stream says about the stream: content types, codecs, decoder configuration.
+// The description that every part of a muxed live stream carries: content types, codecs, decoder configuration.
 #pragma once
 
 #include <string>
@@ -10,10 +10,10 @@
 struct Mpeg4MediaInfo {
     static constexpr int kMaxExtraLen = 1024;
 
-    // Reads everything anew from the two rings.
+    // Reads everything from the two rings, whatever was there before.
     void Update(ShmStreamFifo* video, ShmStreamFifo* audio);
 
-    // "image/" stands before the video codec too: players tell the media apart by it.
+    // Begins with "image/", not "video/": players tell the media apart by that.
     std::string m_VdoContentType;
     std::string m_AdoContentType;
     std::string m_Codecs;  // video codec ";" audio codec

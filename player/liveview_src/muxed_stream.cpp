@@ -2,8 +2,9 @@
 //
 // A camera's video in its own codec together with its audio, as one endless multipart stream.
 //
-// Why so        A decoder can begin at a key frame only, so nothing goes out before one: the newest at once when the ring
-//               has it, else the first that comes. From then on every frame is sent, since each needs the one before.
+// Why so        A decoder can only begin at a key frame, so nothing is sent before one: the newest at once if the ring
+//               has it, otherwise the first that arrives. From then on every frame is sent, since each needs the
+//               previous.
 #include <cstdio>
 
 #include <sys/shm.h>
@@ -23,7 +24,7 @@ long long Timestamp(const DataEntry& entry) {
     return static_cast<long long>((std::uint64_t{entry.m_TimestampHigh} << 32) | entry.m_TimestampLow);
 }
 
-// What has been sent of the two rings, and where reading goes on.
+// The two rings, and how far each has been sent.
 class MuxedStream {
   public:
     MuxedStream(MultipartResponse& multipart, const LiveLoop& loop, ShmStreamFifo* video, ShmStreamFifo* audio)
@@ -36,10 +37,10 @@ class MuxedStream {
     }
 
     void SendNewestKeyFrame();
-    // Read one entry each; true when it was sent.
+    // Each reads one entry; true when it was sent.
     bool PassVideo();
     bool PassAudio();
-    // Ends reading and detaches both rings.
+    // Stops reading and detaches both rings.
     void Close();
 
   private:
@@ -152,7 +153,7 @@ void LiveviewSrcHandler::LiveviewMpeg4Cam(int camId, int streamNo) {
         }
         wrote = stream.PassAudio() || wrote;
         if (wrote) {
-            loop.NoteWrite();  // and on without a rest while there is something to send
+            loop.NoteWrite();  // no sleep while there is something to send
         } else if (!loop.Rest()) {
             break;
         }

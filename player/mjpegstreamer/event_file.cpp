@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The file that holds an event's recording.
+// Finds the file of an event's recording.
 #include "player/mjpegstreamer/event_file.h"
 
 #include "platform/recording/event.h"
@@ -13,7 +13,7 @@ std::string SavedFilename(const AnyEvent& event) {
     return event.IsSaved() ? event.GetFullPath() : std::string();
 }
 
-// Alerts and sales are bound to no mount.
+// Alert and POS events are not bound to a mount.
 template <typename AnyEvent>
 std::string MountlessFilename(int eventId, const char* func) {
     AnyEvent event;

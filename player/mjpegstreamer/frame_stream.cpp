@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What both ways of playback do alike: the opened recording, the picture last read, the pace, the check of the session.
+// Common to both ways of playback: opens the recording, reads and sends pictures, paces them, checks the session.
 #include "player/mjpegstreamer/frame_stream.h"
 
 #include <algorithm>
@@ -18,7 +18,7 @@ namespace {
 constexpr int kBufferSize = 2097152;
 constexpr int kNoNumber = -1;
 
-// The number without its fraction; one that is too large becomes the nearest int, one that is none 0.
+// Truncates toward zero; what does not fit becomes the nearest int, NaN becomes 0.
 int Truncate(double number) {
     constexpr std::numeric_limits<int> kInt;
     return number >= kInt.max()   ? kInt.max()
@@ -96,7 +96,7 @@ int FrameStream::NextStride() {
 
 void FrameStream::SetRate(int rate) {
     const int periodUs = Truncate(1000000.0 / static_cast<double>(m_Info.m_FrameRate));
-    // A faster rate leaves the period alone and skips frames.
+    // A faster rate keeps the period and skips frames.
     m_Timer.SetDelayTime(rate < 0 ? Wrapped(-std::int64_t{periodUs} * rate) : periodUs);
     m_Rate = rate;
 }

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What both ways of playback do alike: the opened recording, the picture last read, the pace, the check of the session.
+// Common to both ways of playback: the opened recording, the picture last read, pacing, the check of the session.
 //
-// Invariants    No frame allocates: one buffer takes each picture, and each is sent from it.
+// Invariants    No allocation per frame: every picture is read into one buffer and sent from it.
 #pragma once
 
 #include <memory>
@@ -14,10 +14,10 @@
 
 class FrameStream {
   public:
-    // timestamp: the client's key of the channel on which rate or position travel.
+    // timestamp: the client's key of the channel that carries rate or position.
     explicit FrameStream(long long timestamp);
 
-    // False when the recording cannot be played, after a log line when it was for want of memory.
+    // False when the recording cannot be played; a log line only when memory could not be allocated.
     bool Open(const std::string& path);
     JpegExtractor& GetExtractor() { return m_Extractor; }
     ProgressIndicator& GetProgress() { return m_Progress; }
@@ -25,18 +25,18 @@ class FrameStream {
 
     // Keeps the frame's picture for SendPicture; false when it cannot be read.
     bool Read(int index);
-    // Each is one part, whose way to the client is not looked at: a client that has gone ends the process by a signal.
+    // Each writes one part. Failures are ignored: a client that disconnects ends the stream by a signal.
     void SendIndex(int index);
     void SendPicture();
 
-    // Begins to play at the rate; below 0 it is slow motion by that factor. interval: 0 or more samples the recording
-    // unpaced, one frame for each so many seconds.
+    // Starts pacing at the rate; a rate below 0 is slow motion by that factor. interval: 0 or more samples the
+    // recording without pacing, one frame per that many seconds.
     void StartPace(int playRate, int interval);
-    // Takes the rate that the client has set, if it is another.
+    // Takes over the rate that the client has set, if it differs.
     void FollowRate();
-    // True when this process has been told to check whether it still has the session, and cannot.
+    // True when this process has been told to check whether it still owns the session, and the check failed.
     bool IsSessionGone() const;
-    // Waits for the next picture's time unless sampling, and gives the number of frames to it.
+    // Waits for the next picture's time unless sampling, and returns the number of frames to advance.
     int NextStride();
 
   private:

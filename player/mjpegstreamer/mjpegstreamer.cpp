@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells the methods of event playback apart, and makes a process the player of its session.
+// Dispatches the methods of event playback, and makes the process the player of its session.
 #include "player/mjpegstreamer/mjpegstreamer.h"
 
 #include <cstdio>
@@ -39,6 +39,6 @@ bool MjpegStreamHandler::TakeSession(const char* func) {
 }
 
 void PrintWarningRedirect() {
-    // Its line feed ends the empty line that ends the head.
+    // The line feed that puts adds completes the empty line after the header.
     std::puts("Location: /webman/3rdparty/Lookhaven/resources/images/2x/components/icon_indicator_warning.png\r\n\r");
 }

@@ -22,9 +22,10 @@ class MjpegStreamHandler : public LHHandlerBase<MjpegStreamHandler> {
     void HandlePlayEventNoFrameId();
 
   private:
-    // Arms the signals and makes this process the session's player. False after a log line under func and an error.
+    // Installs the signal handlers and makes this process the session's player. False after a log line that names func
+    // and a recorded error.
     bool TakeSession(const char* func);
 };
 
-// Sends the client to a warning picture in place of the video, where nothing has been sent yet.
+// Redirects the client to a warning picture in place of the video. Only before anything else is written.
 void PrintWarningRedirect();

@@ -32,7 +32,7 @@ int StreamOut(const std::string& path, int frameStart, int frameStop, long long 
         if (stream.IsSessionGone()) {
             break;
         }
-        // At the end the last picture stands: it is sent again until the player is stopped.
+        // At the end the last picture is held: it is sent again until the player is stopped.
         current = std::min(Wrapped(std::int64_t{current} + stream.NextStride()), stop);
     } while (stream.Read(current) && g_PlayerStop == 0);
     return 0;
@@ -44,7 +44,7 @@ std::string GetFilename(int mountId, int eventId, REC_EVENT_TYPE kind) {
                                    : GetRecordedFilename(mountId, eventId);
 }
 
-// Returns 0 when the event was played, -1 when its file is not there or the stream could not start.
+// Returns 0 when the event was played, -1 when its file is missing or the stream could not start.
 int PlayEvent(int mountId, int eventId, REC_EVENT_TYPE kind, int frameStart, int frameStop, long long timestamp,
               int playRate, int interval) {
     const std::string name = GetFilename(mountId, eventId, kind);

@@ -10,8 +10,8 @@
 
 namespace {
 
-// Returns 0 once the stream has ended, -1 when it could not start. changeRate: the channel to the client carries the rate,
-// which it sets; else the time of the picture being sent.
+// Returns 0 once the stream has ended, -1 when it could not start. changeRate: the channel carries the rate, which the
+// client sets; otherwise the time of the picture being sent.
 int StreamOut(const std::string& path, int startTimeMS, int stopTimeMS, long long timestamp, int playRate,
               bool changeRate, int interval) {
     FrameStream stream(timestamp);
@@ -46,7 +46,7 @@ int StreamOut(const std::string& path, int startTimeMS, int stopTimeMS, long lon
         if (stream.IsSessionGone()) {
             break;
         }
-        // The index runs one ahead of the picture in the buffer; a pause takes that step back.
+        // The index is one ahead of the picture in the buffer; a pause takes that step back.
         current = Wrapped(std::int64_t{current} + stream.NextStride() - 1);
         if (interval >= 0 && current >= stop) {
             current = Wrapped(std::int64_t{stop} - 1);
@@ -62,7 +62,7 @@ int StreamOut(const std::string& path, int startTimeMS, int stopTimeMS, long lon
     return 0;
 }
 
-// Returns 0 when the event was played, -1 when its file is not there or the stream could not start.
+// Returns 0 when the event was played, -1 when its file is missing or the stream could not start.
 int PlayEvent(int mountId, int eventId, int startTimeMS, int stopTimeMS, long long timestamp, int playRate,
               bool changeRate, int interval) {
     const std::string name = GetRecordedFilename(mountId, eventId);
@@ -72,7 +72,7 @@ int PlayEvent(int mountId, int eventId, int startTimeMS, int stopTimeMS, long lo
     return StreamOut(name, startTimeMS, stopTimeMS, timestamp, playRate, changeRate, interval) == 0 ? 0 : -1;
 }
 
-// Makes an event that is still being recorded playable up to now. False when there is no such event.
+// Makes an event that is still being recorded playable up to now; best effort. False when there is no such event.
 bool FlushEvent(int mountId, int eventId) {
     Event event;
     if (event.Load(eventId, mountId, 0, 0) != 0) {
@@ -98,7 +98,7 @@ void MjpegStreamHandler::HandlePlayEventNoFrameId() {
     const long long timestamp = m_pRequest->GetParam("timestamp", 0).asInt64();
 
     if (eventId < 1 || startTimeMS < 0 || timestamp < 1) {
-        // No error here: the redirect is all that is said.
+        // No error code here: the redirect is all that the client gets.
         LH_TRACE(LOG_CATEG_PLAYER, LOG_LEVEL_ERR, kMjpegStreamerSource, "Invalid input\n");
         PrintWarningRedirect();
     } else if (TakeSession(__func__)) {

@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells the days on which recordings exist.
+// Finds the days on which recordings exist.
 //
 // Why so        Days are plain steps of 86,400 s from the start that the client chose. Times are 32-bit and wrap, and a
-//               difference of days is truncated toward zero: an event that ended less than a day before the start counts
-//               for the first day. Counts of days are computed in 64 bits, so that no slot outside the table is touched.
+//               difference of days is truncated toward zero: an event that ended less than a day before the start
+//               counts for the first day. Counts of days are computed in 64 bits, so that no slot outside the table is
+//               touched.
 #include <algorithm>
 #include <array>
 #include <cstdlib>
@@ -19,7 +20,7 @@ namespace {
 constexpr int kMaxDays = 128;
 constexpr int kDaySec = 86400;
 
-// The ids of the text that name one of the cameras. What follows a number up to the next comma is ignored.
+// The ids in the text that are those of cameras. Anything between a number and the next comma is ignored.
 std::set<int> ListedCameras(const std::string& text, const std::map<int, Camera>& cameras) {
     std::set<int> ids;
     for (std::size_t token = 0; token <= text.size();) {
@@ -37,7 +38,7 @@ int DaysBetween(int start, int time) {
     return Wrapped(std::int64_t{time} - start) / kDaySec;
 }
 
-// The first dayCount slots, 1 for a day that some event touches; null when there are none.
+// dayCount numbers, 1 for a day that some event touches, else 0; null when dayCount is below 1.
 Json::Value MarkDays(const std::list<Event>& events, int start, int dayCount) {
     std::array<int, kMaxDays> days = {};
     for (const Event& event : events) {

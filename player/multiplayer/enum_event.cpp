@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Lists the events of a time span, and which of its seconds were recorded.
+// Lists the events of a time span, with a map of its recorded seconds.
 //
-// Invariants    (1) The span is between one second and 32 days, so that two buffers of a byte per second stay small.
-//               (2) What is marked of an event lies within the buffer: see MarkCoverage.
+// Invariants    (1) The span is from one second to 32 days, which bounds the two buffers of one byte per second.
+//               (2) Nothing is marked outside the buffer: see MarkCoverage.
 #include <algorithm>
 #include <cstring>
 #include <list>
@@ -36,7 +36,7 @@ Json::Value DescribeEvent(const Event& event, bool withAudio) {
     description["archived"] = event.GetArchived();
     description["event_size"] = static_cast<double>(event.GetSize()) * 0x1p-20;
     description["fisheye_origin_view"] = event.IsOriginalView();
-    // Clients of two ages read the same three values under different names.
+    // Older and newer clients read the same three values under different names.
     description["start"] = event.GetStartTm();
     description["stop"] = event.GetEndTm();
     description["frame_count"] = event.GetFrameCount();
@@ -48,7 +48,7 @@ bool IsCovering(int recMethod) {
     return static_cast<std::uint8_t>(static_cast<unsigned int>(recMethod) - 1U) <= 5 || recMethod == 10;
 }
 
-// An event that began before the span covers its whole length from the span's begin on.
+// An event that began before the span covers its whole length from the beginning of the span on.
 void MarkCoverage(const Event& event, int from, std::vector<unsigned char>& coverage) {
     const int offset = std::max(Wrapped(std::int64_t{event.GetStartTm()} - from), 0);
     const int length = std::min(Wrapped(std::int64_t{event.GetEndTm()} - event.GetStartTm()),
@@ -58,7 +58,7 @@ void MarkCoverage(const Event& event, int from, std::vector<unsigned char>& cove
     }
 }
 
-// One camera's part of a search: its events, and the buffers that all cameras share.
+// The search on one camera; the buffers are reused for the next.
 struct CameraSearch {
     const Camera& m_Camera;
     int m_From;

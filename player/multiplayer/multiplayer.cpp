@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells the methods of event search apart, and finds the cameras that a search may look at.
+// Dispatches the methods of event search, and selects the cameras of a search.
 #include "player/multiplayer/multiplayer.h"
 
 #include "player/iter2string.h"

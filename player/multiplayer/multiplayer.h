@@ -24,8 +24,8 @@ class MultiPlayerHandler : public LHHandlerBase<MultiPlayerHandler> {
     void HandleSearchAvaiDate();
 
   private:
-    // What a search may look at: the cameras of the group, or of the mount without the denied ones when no group is asked
-    // for. A group's own cameras are not filtered here. func: whom the log lines name.
+    // The cameras of a search: those of the group, or without a group those of the mount except the denied ones. A
+    // group's cameras are not filtered here.
     struct CamChoice {
         int m_GroupId;
         int m_MountId;
@@ -34,8 +34,8 @@ class MultiPlayerHandler : public LHHandlerBase<MultiPlayerHandler> {
         const char* m_szFunc;
     };
 
-    // Each returns false after a log line and an error: for a user without a profile, for a group that the user may not
-    // see or that does not exist.
+    // Each returns false after a log line and a recorded error: for a user without a profile; for a group that the user
+    // may not access or that does not exist. The log lines name func.
     bool CheckProfile(const PrivProfile& profile, unsigned int uid, const char* func);
     bool ChooseCameras(const CamChoice& choice, std::map<int, Camera>& cameras);
 };

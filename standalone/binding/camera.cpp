@@ -51,8 +51,8 @@ Camera RecordOf(const store::Camera& from) {
     for (int profile = 0; profile < CAM_PROFILE_COUNT; ++profile) {
         to.m_StreamNo[profile] = from.FindProfile(profile) != nullptr ? profile : kNoStream;
     }
-    to.m_blPtz = from.ptz;
-    to.m_blAudio = from.audio;
+    to.m_AudioType = from.audio ? CAM_AUDIO_SUPPORTED : CAM_AUDIO_NONE;
+    to.m_DeviceType = from.ptz ? CAM_DEVICE_PTZ : CAM_DEVICE_FIXED;
     return to;
 }
 
@@ -92,8 +92,8 @@ Camera::Camera()
       m_VideoType(0),
       m_LiveProfile(CAM_PROFILE_HIGH),
       m_StreamNo{kNoStream, kNoStream, kNoStream},
-      m_blPtz(false),
-      m_blAudio(false) {}
+      m_AudioType(CAM_AUDIO_NONE),
+      m_DeviceType(CAM_DEVICE_UNKNOWN) {}
 
 int Camera::Load(int camId, int serverId, int archiveId) {
     if (serverId != 0 || archiveId != 0) {
@@ -162,7 +162,7 @@ DevCapHandler::~DevCapHandler() = default;
 
 int DevCapHandler::LoadByCam(const Camera& camera) {
     auto device = std::make_unique<Device>();
-    device->has_sound = camera.m_blAudio;
+    device->has_sound = camera.m_AudioType != CAM_AUDIO_NONE;
     m_pDevice = std::move(device);
     m_pSoundSupport = std::make_unique<SoundSupport>();
     m_SoundSupport = {m_pDevice.get(), m_pSoundSupport.get(), "SoundSupport"};
@@ -171,7 +171,7 @@ int DevCapHandler::LoadByCam(const Camera& camera) {
 
 unsigned int CamCapUtils::GetLiveStmPtzCapByUserName(const DevCapHandler&, const Camera& camera,
                                                      const std::string& userName) {
-    return !camera.m_blPtz ? 0 : OrFailure("GetLiveStmPtzCapByUserName", 0U, [&] {
+    return camera.m_DeviceType != CAM_DEVICE_PTZ ? 0 : OrFailure("GetLiveStmPtzCapByUserName", 0U, [&] {
         store::Users users(RequestContext::Current().Records());
         const auto user = users.FindByName(userName);
         return user && !users.DeniedCameras(user->id, store::CameraAccess::kLive).contains(camera.m_Id) ? kPtzMoves

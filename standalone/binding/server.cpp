@@ -52,7 +52,7 @@ int Camera::LoadByIdOnRecServer(int idOnServer, int serverId) {
         found->name.copy(m_szName, sizeof m_szName - 1);
         m_blEnabled = true;
         m_VideoType = static_cast<int>(found->video_type);
-        m_blAudio = found->audio;
+        m_AudioType = found->audio ? CAM_AUDIO_SUPPORTED : CAM_AUDIO_NONE;
         m_OwnerDevName = Servers().Find(serverId).value_or(store::RecordingServer()).name;
         return 0;
     });

@@ -1,32 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Event search: which days and seconds are marked, what is asked in which order, who is turned away.
+// Event search: which days and seconds are marked, the order of calls, which requests are rejected.
 #include <climits>
+#include <sstream>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "player/multiplayer/multiplayer.h"
 #include "player/multiplayer/time_zone_keys.h"
-#include "test/support/platform/scripted_platform.h"
+#include "test/support/platform/record.h"
 
-using lookhaven::test::Calls;
-using lookhaven::test::MakeCamera;
-using lookhaven::test::MakeEvent;
-using lookhaven::test::operator+;
-using lookhaven::test::ScriptedPlatform;
+using namespace lookhaven::test;
 using testing::ElementsAre;
-using Script = std::function<void(ScriptedPlatform&)>;
 
 namespace {
 
 constexpr int kDay = 86400;
 
-// A search of cameras 2 and 4 by a user who may not see 9 and 12 nor group 6.
+// A search of cameras 2 and 4 by a user who may not access cameras 9 and 12 nor group 6.
 struct Search {
     explicit Search(const char* method) {
         platform.method = method;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = LOG_LEVEL_ERR;
+        platform.log_cfg.m_CategLevel[68] = 1;
         platform.denied_cameras = {12, 9};
         platform.denied_groups = {6};
         for (const int id : {2, 4}) {
@@ -111,7 +107,7 @@ TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
     struct Row {
         int start, day_count;
         std::ptrdiff_t slots;
-        const char* span;  // asked for
+        const char* span;  // of the query
     };
     const Row rows[] = {
         {0, 128, 128, "0,11059200"},     {0, 129, 128, "0,11059200"},
@@ -136,7 +132,7 @@ TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
 TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
     struct Row {
         const char* list;
-        const char* ids;  // "" when nothing is asked
+        const char* ids;  // "" for no query
     };
     const Row rows[] = {
         {"", ""},     {",,", ""}, {"2,4", "2+4"}, {"4,2,4", "2+4"},      {"1,,x,2", "2"}, {"2x, 4", "2+4"},
@@ -156,43 +152,43 @@ TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
     }
 }
 
-struct TurnedAwayRow {
+struct RejectedRow {
     const char* name;
-    Script before;
+    Change before;
     std::string log;   // "" for none
     int code;          // 0: success
     const char* last;  // call before the answer
 };
 
-TEST(EventSearch, TurnsAway) {
+TEST(EventSearch, Rejects) {
     const std::string uid = "Failed to load priv profile of Uid[7].\n", span = "Error time duration.\n";
-    const TurnedAwayRow both[] = {
-        {"no profile", [](auto& p) { p.profile_id = 0; }, uid, 401, "PrivProfileGetByUid"},
-        {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, "PrivProfileGetByUid"},
-        {"forbidden group", [](auto& p) { p.params["camGrpId"] = 6; }, "Inaccessible camera group[6].\n", 401,
-         "GetInaPrivPerCamGrpIdSet"},
-        {"forbidden group that is not there", [](auto& p) { p.params["camGrpId"] = 6, p.group_result = 1; },
-         "Inaccessible camera group[6].\n", 401, "GetInaPrivPerCamGrpIdSet"},
-        {"unknown group", [](auto& p) { p.params["camGrpId"] = 5, p.group_result = 1; },
-         "Failed to load camera group[5].\n", 400, "CamGroup::Load"},
-        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 0; }, "", 401,
-         "PrivProfileGetByUid"},
+    const std::string forbidden = "Inaccessible camera group[6].\n", unknown = "Failed to load camera group[5].\n";
+    const char *profile = "PrivProfileGetByUid", *groups = "GetInaPrivPerCamGrpIdSet", *load = "CamGroup::Load";
+    const auto group = [](int id, int result) {
+        return [=](ScriptedPlatform& p) { p.params["camGrpId"] = id, p.group_result = result; };
     };
-    const auto from_to = [](int from, int to) {
-        return [=](ScriptedPlatform& p) { p.params["from"] = from, p.params["to"] = to; };
+    const RejectedRow both[] = {
+        {"no profile, and a forbidden group", Change(group(6, 0)) + [](auto& p) { p.profile_id = 0; }, uid, 401,
+         profile},
+        {"negative profile", [](auto& p) { p.profile_id = -1; }, uid, 401, profile},
+        {"forbidden group", group(6, 0), forbidden, 401, groups},
+        {"forbidden group that is not there", group(6, 1), forbidden, 401, groups},
+        {"unknown group", group(5, 1), unknown, 400, load},
+        {"a group that fails", group(5, -1), unknown, 400, load},
+        {"quiet", [](auto& p) { p.profile_id = 0, p.log_cfg.m_CategLevel[68] = 0; }, "", 401, profile},
     };
-    const TurnedAwayRow only_events[] = {
-        {"no span", from_to(5, 5), span, 401, "PrivProfileGetByUid"},
-        {"negative span of nobody", [](auto& p) { p.params["to"] = 5, p.profile_id = 0; }, span, 401,
-         "PrivProfileGetByUid"},
+    const auto from_to = [](int from, int to) { return Params({{"from", from}, {"to", to}}); };
+    const RejectedRow only_events[] = {
+        {"no span", from_to(5, 5), span, 401, profile},
+        {"negative span of nobody", Params({{"to", 5}}) + [](auto& p) { p.profile_id = 0; }, span, 401, profile},
         {"32 days", from_to(0, 32 * kDay), "", 0, "FillRecLogMap"},
-        {"more than 32 days", from_to(0, 32 * kDay + 1), span, 401, "PrivProfileGetByUid"},
-        {"as long as can be", from_to(0, INT_MAX), span, 401, "PrivProfileGetByUid"},
-        {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, "PrivProfileGetByUid"},
+        {"more than 32 days", from_to(0, 32 * kDay + 1), span, 401, profile},
+        {"as long as can be", from_to(0, INT_MAX), span, 401, profile},
+        {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, profile},
         {"the last second", from_to(INT_MAX - 1, INT_MAX), "", 0, "FillRecLogMap"},
         {"over the wrap of time", from_to(INT_MAX, INT_MIN), "", 0, "FillRecLogMap"},
     };
-    const auto check = [](const char* method, const TurnedAwayRow& row) {
+    const auto check = [](const char* method, const RejectedRow& row) {
         SCOPED_TRACE(std::string(method) + " " + row.name);
         Search search(method);
         row.before(search.platform);
@@ -202,6 +198,7 @@ TEST(EventSearch, TurnsAway) {
         if (!logs.empty()) {
             EXPECT_EQ(logs[0].text, row.log);
             EXPECT_EQ(logs[0].file + " " + logs[0].func, std::string("multiplayer Handle") + method);
+            EXPECT_EQ(logs[0].categ + logs[0].level, "player1");
         }
         const auto calls = search.All("");
         EXPECT_THAT(calls.at(calls.size() - 2 - logs.size()), testing::StartsWith(row.last));
@@ -221,23 +218,23 @@ TEST(EventSearch, TurnsAway) {
 TEST(EventSearch, AGroupDecidesAloneWhichCamerasItHas) {
     for (const char* method : {"SearchAvaiDate", "EnumEvent"}) {
         Search search(method);
-        search.platform.params["camGrpId"] = 1;
-        search.platform.params["cameralists"] = "12,2";
+        Params({{"camGrpId", 1}, {"mount_id", 3}, {"cameralists", "12,2"}})(search.platform);
         search.Run();
         EXPECT_EQ(search.platform.CallsFrom("CamGroup::Load").at(1), "GetCamMap(1)");
         ASSERT_EQ(search.All("EventListGetAll").size(), 1U) << "a denied camera of the group, none outside it";
-        EXPECT_THAT(search.All("EventListGetAll")[0], testing::HasSubstr(",12,"));
+        EXPECT_THAT(search.All("EventListGetAll")[0],
+                    testing::AllOf(testing::StartsWith("EventListGetAll(3,"), testing::HasSubstr(",12,")));
     }
 }
 
 TEST(EventSearch, TracesTheRequestAtLevel5) {
     for (const int level : {4, 5}) {
         Search search("Other");
-        search.platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = level;
+        search.platform.log_cfg.m_CategLevel[68] = level;
         search.platform.params[""]["a"] = 1;
         search.Run();
         EXPECT_EQ(search.All("log"),
-                  (level == 4 ? Calls{} : Calls{"log Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
+                  (level == 4 ? Calls{} : Calls{"log player/5 Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
         EXPECT_EQ(search.All("").size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
     }
 }
@@ -258,29 +255,44 @@ TEST(EnumEvent, AsksInOrder) {
 }
 
 TEST(EnumEvent, DescribesEachEvent) {
-    Search search("EnumEvent");
-    Event event = MakeEvent(31, 1000001, 1000002, 7);
-    event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
-    event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
-    search.platform.found_events = {event};
-    search.platform.muted_cameras = {4};
-    search.platform.mount_cameras[0] = MakeCamera(0, 1);
-    search.platform.rec_log_result = 1;
-    search.platform.params["recording"] = true;
-    search.platform.params["cameralists"] = "4,1,9,0,2,2";
-    search.Run();
-    const auto entry = [](const char* audio, const char* id) {
-        return std::string("{\"camera_id\":") + id + ",\"event\":[{\"archived\":false,\"audio_format\":\"" + audio +
-               "\",\"event_size\":1.5,\"fisheye_origin_view\":true,\"frameCount\":33,\"frame_count\":33,\"id\":31,"
-               "\"id_on_RecServer\":1031,\"img_height\":360,\"img_width\":640,\"is_recording\":true,"
-               "\"name\":\"2/x.mkv\",\"record_type\":7,\"start\":1000001,\"startTime\":1000001,\"stop\":1000002,"
-               "\"stopTime\":1000002,\"video_type\":3}],\"total\":1}";
-    };
-    EXPECT_EQ(search.platform.calls.back(),
-              "SetSuccess({\"camera\":[" + entry("", "4") + "," + entry("AAC", "2") + "," + entry("AAC", "2") + "]})");
-    EXPECT_THAT(search.All("EventListGetAll"), ElementsAre("EventListGetAll(0,-1,1000000,1000060,4,0,0,6,camera_id)",
-                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)",
-                                                           "EventListGetAll(0,-1,1000000,1000060,2,0,0,6,camera_id)"));
+    for (const int rec_log_result : {1, -1}) {
+        Search search("EnumEvent");
+        Event event = MakeEvent(31, 1000001, 1000002, 7);
+        event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
+        event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
+        search.platform.found_events = {event, event};
+        Event& other = search.platform.found_events.back();
+        other.m_CamId = 2, other.m_blArchived = true, other.m_blRecording = false, other.m_Size = 1ULL << 43;
+        search.platform.muted_cameras = {4};
+        search.platform.mount_cameras[0] = MakeCamera(0, 1);
+        search.platform.mount_cameras[1] = MakeCamera(1, CAM_VIDEO_MJPEG);
+        search.platform.rec_log_result = rec_log_result;
+        Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search.platform);
+        search.Run();
+        Json::Value first, expected;
+        std::istringstream(
+            R"({"archived":false,"event_size":1.5,"fisheye_origin_view":true,"frameCount":33,"frame_count":33,"id":31,
+                "id_on_RecServer":1031,"img_height":360,"img_width":640,"is_recording":true,"name":"2/x.mkv",
+                "record_type":7,"start":1000001,"startTime":1000001,"stop":1000002,"stopTime":1000002,"video_type":3})") >>
+            first;
+        Json::Value second = first;
+        second["archived"] = true;
+        second["fisheye_origin_view"] = second["is_recording"] = false;
+        second["event_size"] = 8388608.0;
+        Calls queries;
+        for (const int id : {4, 1, 2, 2}) {
+            first["audio_format"] = second["audio_format"] = id == 4 ? "" : "AAC";
+            Json::Value& entry = expected["camera"].append(Json::Value());
+            entry["camera_id"] = id;
+            entry["event"].append(first);
+            entry["event"].append(second);
+            entry["total"] = 2U;
+            queries.push_back("EventListGetAll(0,-1,1000000,1000060," + std::to_string(id) + ",0,0," +
+                              (id == 1 ? "1" : "6") + ",camera_id)");
+        }
+        EXPECT_EQ(search.platform.calls.back(), "SetSuccess(" + Text(expected) + ")");
+        EXPECT_EQ(search.All("EventListGetAll"), queries);
+    }
 }
 
 TEST(EnumEvent, OfNoCameraIsAnEmptyList) {
@@ -317,7 +329,8 @@ TEST(EnumEvent, MarksCoverage) {
          100,
          110,
          {MakeEvent(1, 100, 101, 0), MakeEvent(1, 101, 102, 7), MakeEvent(1, 102, 103, 9), MakeEvent(1, 103, 104, 11),
-          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1)},
+          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1), MakeEvent(1, 106, 107, 8),
+          MakeEvent(1, 107, 108, 266)},
          ".........."},
         {"from the lowest to the highest time", 100, 110, {MakeEvent(1, INT_MIN, INT_MAX)}, ".........."},
         {"over the wrap of time", INT_MAX - 4, INT_MAX, {MakeEvent(1, INT_MAX - 2, INT_MIN)}, "..XX"},
@@ -326,14 +339,10 @@ TEST(EnumEvent, MarksCoverage) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         Search search("EnumEvent");
-        search.platform.params["from"] = row.from;
-        search.platform.params["to"] = row.to;
-        search.platform.params["interval"] = -3;
-        search.platform.params["cameralists"] = "2,4";
+        Params({{"from", row.from}, {"to", row.to}, {"interval", -3}, {"cameralists", "2,4"}})(search.platform);
         search.platform.found_events = {row.events.begin(), row.events.end()};
         search.platform.on_call = [&](const std::string& call) {
-            if (call.rfind("SetSuccess", 0) != 0 && call.rfind("EventListGetAll", 0) == 0 &&
-                call.find(",4,") != std::string::npos) {
+            if (call.rfind("EventListGetAll", 0) == 0 && call.find(",4,") != std::string::npos) {
                 search.platform.found_events.clear();
             }
         };

@@ -1,22 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The camera list: whom it shows what, and what it says when it cannot.
+// The camera list: which cameras it holds for whom, and what is logged when it fails.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "player/liveview/liveview.h"
 #include "test/support/platform/scripted_platform.h"
 
-using lookhaven::test::MakeCamera;
-using lookhaven::test::ScriptedPlatform;
-using lookhaven::test::Sound;
+using namespace lookhaven::test;
 using testing::ElementsAre;
 using testing::IsEmpty;
-using Script = std::function<void(ScriptedPlatform&)>;
 
 namespace {
 
-void Load(ScriptedPlatform& platform, const Script& script) {
+void Load(ScriptedPlatform& platform, const Change& script) {
     platform.method = "LoadCamera";
     platform.camera_list = {MakeCamera(2, CAM_VIDEO_H264), MakeCamera(3, CAM_VIDEO_MJPEG, false),
                             MakeCamera(4, CAM_VIDEO_MJPEG), MakeCamera(6, CAM_VIDEO_MJPEG)};
@@ -24,9 +21,11 @@ void Load(ScriptedPlatform& platform, const Script& script) {
     LiveviewHandler(platform.Request(), platform.Response()).HandleProcess();
 }
 
-std::string Camera4(const char* sound) {
-    return std::string("{\"cam_ptz\":2147483652,\"id\":4,\"liveview_port\":5000,\"name\":\"cam4\",\"sound_support\":") +
-           sound + ",\"video_type\":1}";
+std::string Listed(int id, int video_type, int sound) {
+    const std::string number = std::to_string(id);
+    return "{\"cam_ptz\":" + std::to_string(0x80000000U + static_cast<unsigned int>(id)) + ",\"id\":" + number +
+           ",\"liveview_port\":5000,\"name\":\"cam" + number + "\",\"sound_support\":" + std::to_string(sound) +
+           ",\"video_type\":" + std::to_string(video_type) + "}";
 }
 
 TEST(LoadCamera, AsksInOrderAndOnlyForEnabledCameras) {
@@ -42,50 +41,44 @@ TEST(LoadCamera, AsksInOrderAndOnlyForEnabledCameras) {
 
 struct AnswerRow {
     const char* name;
-    Script script;
-    std::string answer;
+    Change script;
+    const char* answer;  // without the cameras
+    std::string cameras = Listed(4, 1, 1);
 };
 
 TEST(LoadCamera, Answers) {
-    const auto only4 = [](auto& p) { p.camera_list = {MakeCamera(3, 1, false), MakeCamera(4, CAM_VIDEO_MJPEG)}; };
-    const auto tail = [](int selected, const char* show_all, const char* manager) {
-        return std::string("],\"isManager\":") + manager + ",\"selected\":" + std::to_string(selected) + "}|" +
-               show_all;
-    };
-    const auto answer = [](const std::string& camera, const std::string& tail_text) {
-        const auto bar = tail_text.find('|');
-        return "SetSuccess({\"CamNum\":2,\"EnableCamNum\":1,\"ShowAll\":" + tail_text.substr(bar + 1) +
-               ",\"camera\":[" + camera + tail_text.substr(0, bar) + ")";
-    };
     const AnswerRow rows[] = {
-        {"first MJPEG camera", [](auto&) {}, answer(Camera4("1"), tail(4, "1", "false"))},
-        {"a camera that is not listed", [](auto& p) { p.params["camera"] = 5; },
-         answer(Camera4("1"), tail(5, "0", "false"))},
-        {"negative camera", [](auto& p) { p.params["camera"] = -3; }, answer(Camera4("1"), tail(-3, "1", "false"))},
-        {"privilege 0", [](auto& p) { p.privilege = 0; }, answer(Camera4("1"), tail(4, "1", "true"))},
-        {"privilege 1", [](auto& p) { p.privilege = 1; }, answer(Camera4("1"), tail(4, "1", "true"))},
-        {"deaf", [](auto& p) { p.sound[4] = Sound::kNo; }, answer(Camera4("0"), tail(4, "1", "false"))},
-        {"all disabled", [](auto& p) { p.camera_list = {MakeCamera(3, 1, false)}; },
-         "SetSuccess({\"CamNum\":1,\"EnableCamNum\":0,\"ShowAll\":1,\"isManager\":false,\"selected\":-1})"},
+        {"first MJPEG camera", Nothing, R"("ShowAll":1,#"isManager":false,"selected":4)"},
+        {"a camera that is not listed", Params({{"camera", 5}}), R"("ShowAll":0,#"isManager":false,"selected":5)"},
+        {"camera 1", Params({{"camera", 1}}), R"("ShowAll":0,#"isManager":false,"selected":1)"},
+        {"negative camera", Params({{"camera", -3}}), R"("ShowAll":1,#"isManager":false,"selected":-3)"},
+        {"privilege 0", [](auto& p) { p.privilege = 0; }, R"("ShowAll":1,#"isManager":true,"selected":4)"},
+        {"privilege 1", [](auto& p) { p.privilege = 1; }, R"("ShowAll":1,#"isManager":true,"selected":4)"},
+        {"no sound", [](auto& p) { p.sound[4] = Sound::kNo; }, R"("ShowAll":1,#"isManager":false,"selected":4)",
+         Listed(4, 1, 0)},
+        {"no MJPEG", [](auto& p) { p.camera_list.back() = MakeCamera(2, CAM_VIDEO_H264); },
+         R"("ShowAll":1,#"isManager":false,"selected":-1)", Listed(2, 3, 1)},
+        {"all disabled", [](auto& p) { p.camera_list.back().m_blEnabled = false; },
+         R"("ShowAll":1,#"isManager":false,"selected":-1)", ""},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         ScriptedPlatform platform;
-        Load(platform, [&](auto& p) { only4(p), row.script(p); });
-        EXPECT_EQ(platform.calls.back(), row.answer);
+        Load(platform, [&](auto& p) {
+            p.camera_list = {MakeCamera(3, 1, false), MakeCamera(4, CAM_VIDEO_MJPEG)};
+            row.script(p);
+        });
+        std::string answer = row.answer;
+        answer.replace(answer.find('#'), 1, row.cameras.empty() ? "" : "\"camera\":[" + row.cameras + "],");
+        EXPECT_EQ(platform.calls.back(), "SetSuccess({\"CamNum\":2,\"EnableCamNum\":" +
+                                             std::string(row.cameras.empty() ? "0," : "1,") + answer + "})");
         EXPECT_THAT(platform.logs, IsEmpty());
     }
 }
 
-TEST(LoadCamera, SelectsNoneWhenNoneIsMjpeg) {
-    ScriptedPlatform platform;
-    Load(platform, [](auto& p) { p.camera_list.resize(2); });
-    EXPECT_THAT(platform.calls.back(), testing::EndsWith("\"selected\":-1})"));
-}
-
 struct FailureRow {
     const char* name;
-    Script script;
+    Change script;
     std::vector<std::string> logs;  // source:line function: text
     bool answered;
 };
@@ -93,19 +86,21 @@ struct FailureRow {
 TEST(LoadCamera, FailuresAreLoggedAndOnlyABrokenFunctorIsForgiven) {
     const std::string failed = "liveview:96 HandleLiveviewLoad: Failed to sent camera data.\n";
     const std::string functor = "interface/handlerutils:";
+    const std::string no_port = "liveview:36 SendCamerasData: Failed to get direct login port.\n";
+    const std::string not_registered =
+        functor +
+        "544 operator(): [Sound] Error: Some Functor is not registered properly. Check the template argument list and "
+        "Function ID.\n";
     const FailureRow rows[] = {
-        {"unknown user",
-         [](auto& p) { p.profile_id = 0; },
+        {"unknown user, and no port",
+         [](auto& p) { p.profile_id = p.login_port = 0; },
          {"liveview:24 SendCamerasData: Incorrect priv profile of Uid[7].\n", failed},
          false},
-        {"no port",
-         [](auto& p) { p.login_port = 0; },
-         {"liveview:36 SendCamerasData: Failed to get direct login port.\n", failed},
+        {"no port, nor capabilities",
+         [](auto& p) { p.login_port = 0, p.cap_failures = {2}; },
+         {no_port, failed},
          false},
-        {"negative port",
-         [](auto& p) { p.login_port = -1; },
-         {"liveview:36 SendCamerasData: Failed to get direct login port.\n", failed},
-         false},
+        {"negative port", [](auto& p) { p.login_port = -1; }, {no_port, failed}, false},
         {"capability of one camera",
          [](auto& p) { p.cap_failures = {4}; },
          {"liveview:57 SendCamerasData: Failed to get camera cap.\n", failed},
@@ -115,16 +110,8 @@ TEST(LoadCamera, FailuresAreLoggedAndOnlyABrokenFunctorIsForgiven) {
          [](auto& p) { p.sound[4] = Sound::kNoTarget; },
          {functor + "541 operator(): [Sound] Error: Failed to run functor with DPObjectBase as NULL.\n"},
          true},
-        {"no functor",
-         [](auto& p) { p.sound[4] = Sound::kNoFunctor; },
-         {functor + "544 operator(): [Sound] Error: Some Functor is not registered properly. Check the template "
-                    "argument list and Function ID.\n"},
-         true},
-        {"functor of another type",
-         [](auto& p) { p.sound[4] = Sound::kWrongType; },
-         {functor + "544 operator(): [Sound] Error: Some Functor is not registered properly. Check the template "
-                    "argument list and Function ID.\n"},
-         true},
+        {"no functor", [](auto& p) { p.sound[4] = Sound::kNoFunctor; }, {not_registered}, true},
+        {"functor of another type", [](auto& p) { p.sound[4] = Sound::kWrongType; }, {not_registered}, true},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
@@ -138,7 +125,7 @@ TEST(LoadCamera, FailuresAreLoggedAndOnlyABrokenFunctorIsForgiven) {
         EXPECT_EQ(logs, row.logs);
         EXPECT_EQ(platform.CallsFrom("Set").size(), row.answered ? 1U : 0U);
         if (row.answered && !row.logs.empty()) {
-            EXPECT_THAT(platform.calls.back(), testing::HasSubstr(Camera4("0")));
+            EXPECT_THAT(platform.calls.back(), testing::HasSubstr(Listed(4, 1, 0)));
         }
     }
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which frames each loop of playback sends, how fast, and what it tells meanwhile.
+// Which frames each loop of playback sends, how fast, and what it publishes meanwhile.
 #include <climits>
 #include <cmath>
 
@@ -15,106 +15,93 @@ namespace {
 
 struct FramesRow {
     const char* name;
-    const char* method;
-    Script before;
-    std::map<int, Script> plan;
     std::string frames;  // the stream is stopped at the fifth picture unless it ends before
+    Change before = Nothing;
+    std::map<int, Change> plan = {};
 };
 
-const FramesRow kFrames[] = {
-    {"the last stands", kByIndex, Frames(3), {}, "0:P0 1:P1 2:P2 2:P2 2:P2 "},
-    {"rate 4", kByIndex, Frames(10) + Params({{"playrate", 4}}), {}, "0:P0 4:P4 8:P8 9:P9 9:P9 "},
-    {"rate -2", kByIndex, Params({{"playrate", -2}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"rate 0", kByIndex, Params({{"playrate", 0}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"changed rate", kByIndex, Nothing, {{2, ClientSets(2)}, {4, ClientSets(-1)}}, "0:P0 1:P1 3:P3 5:P5 7:P7 "},
-    {"given stop", kByIndex, Params({{"framestart", 1}, {"framestop", 2}}), {}, "1:P1 2:P2 2:P2 2:P2 2:P2 "},
-    {"one frame", kByIndex, Params({{"framestart", 1}, {"framestop", 1}}), {}, "1:P1 1:P1 1:P1 1:P1 1:P1 "},
-    {"stop before start", kByIndex, Params({{"framestart", 2}, {"framestop", 1}}), {}, "2:P2 3:P3 4:P4 5:P5 6:P6 "},
-    {"stop past the end", kByIndex, Frames(2) + Params({{"framestop", 9}}), {}, "0:P0 1:P1 "},
-    {"unreadable", kByIndex, [](auto& p) { p.broken_frames = {2}; }, {}, "0:P0 1:P1 "},
-    {"interval 2", kByIndex, Params({{"interval", 2}, {"playrate", 4}}), {}, "0:P0 20:P20 40:P40 60:P60 80:P80 "},
-    {"interval 0", kByIndex, Params({{"interval", 0}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"interval 1", kByIndex, Params({{"interval", 1}}), {}, "0:P0 10:P10 20:P20 30:P30 40:P40 "},
-    {"step 0",
-     kByIndex,
-     Params({{"interval", 9}}) + [](auto& p) { p.frame_rate = 0.5; },
-     {},
-     "0:P0 0:P0 0:P0 0:P0 0:P0 "},
-    {"changed to 0 and below",
-     kByIndex,
-     Params({{"playrate", 3}}),
-     {{2, ClientSets(0)}, {4, ClientSets(-2)}},
-     "0:P0 3:P3 4:P4 5:P5 6:P6 "},
-    {"rate refused", kByIndex, [](auto& p) { p.progress_result = 1; }, {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"no pause", kByIndex, Nothing, {{2, Signal(SIGUSR2)}}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"stopped before", kByIndex, Nothing, {{0, Signal(SIGTERM)}}, ""},
-    {"highest rate", kByIndex, Params({{"playrate", INT_MAX}}), {}, "0:P0 99:P99 "},
-    {"lowest rate", kByIndex, Params({{"playrate", INT_MIN}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"highest interval", kByIndex, Params({{"interval", INT_MAX}}), {}, "0:P0 "},
-    {"lowest interval", kByIndex, Params({{"interval", INT_MIN}}), {}, "0:P0 1:P1 2:P2 3:P3 4:P4 "},
-    {"highest frame rate", kByIndex, Params({{"interval", 2}}) + [](auto& p) { p.frame_rate = 1e30F; }, {}, "0:P0 "},
+const Change kRefused = [](auto& p) { p.progress_result = 1; };
+const Change kHalfFps = [](auto& p) { p.frame_rate = 0.5; };
+const Change kEvent1 = [](auto& p) { p.events[1] = p.events[3]; };
+const Change kGrown = [](auto& p) { p.frame_count = 2, p.grown_by = 9; };
+const Change kBroken = [](auto& p) { p.write_result = -1, p.flush_fails = true; };
 
-    {"to the end", kByTime, Frames(4), {}, "P0 P0 P1 P2 "},
-    {"given stop", kByTime, Params({{"startTimeMS", 15}, {"stopTimeMS", 39}}), {}, "P1 P1 P2 "},
-    {"one frame", kByTime, Params({{"startTimeMS", 20}, {"stopTimeMS", 25}}), {}, "P2 "},
-    {"stop before start", kByTime, Frames(7) + Params({{"startTimeMS", 50}, {"stopTimeMS", 30}}), {}, "P5 P5 "},
-    {"start kept in 32 bits", kByTime, Params({{"startTimeMS", Json::Int64{1} << 32}}), {}, "P0 P0 P1 P2 P3 "},
-    {"rate 4, then past the end", kByTime, Frames(10) + Params({{"playrate", 4}}), {}, "P0 P3 P7 "},
-    {"rate -2", kByTime, Params({{"playrate", -2}}), {}, "P0 P0 P1 P2 P3 "},
-    {"rate 0", kByTime, Params({{"playrate", 0}}), {}, "P0 P0 P1 P2 P3 "},
-    {"changed rate",
-     kByTime,
-     Params({{"changerate", 2}}),
-     {{2, ClientSets(2)}, {4, ClientSets(-1)}},
-     "P0 P0 P2 P4 P6 "},
-    {"no rate to follow", kByTime, ClientSets(4), {}, "P0 P0 P1 P2 P3 "},
-    {"paused and resumed", kByTime, Nothing, {{2, Signal(SIGUSR2)}, {4, Signal(SIGUSR2)}}, "P0 P0 P0 P0 P1 "},
-    {"paused at the first", kByTime, Nothing, {{1, Signal(SIGUSR2)}}, "P0 P0 P0 P0 P0 "},
-    {"paused before the first", kByTime, Nothing, {{0, Signal(SIGUSR2)}, {3, Signal(SIGUSR2)}}, "P0 P0 P0 P1 P2 "},
-    {"paused at rate 4", kByTime, Params({{"playrate", 4}}), {{2, Signal(SIGUSR2)}}, "P0 P3 P6 P9 P12 "},
-    {"paused while sampling", kByTime, Params({{"interval", 0}}), {{3, Signal(SIGUSR2)}}, "0:P0 1:P0 2:P1 2:P1 2:P1 "},
+const FramesRow kByIndexRows[] = {
+    {"the last is held", "0:P0 1:P1 2:P2 2:P2 2:P2 ", Frames(3)},
+    {"lowest ids", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"eventid", 1}, {"timestamp", 1}}) + kEvent1},
+    {"start past the last frame of the count", "", Params({{"framestart", 5}}) + kGrown},
+    {"broken output", "0:P0 1:P1 2:P2 3:P3 4:P4 ", kBroken},
+    {"rate 4", "0:P0 4:P4 8:P8 9:P9 9:P9 ", Frames(10) + Params({{"playrate", 4}})},
+    {"rate -2", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"playrate", -2}})},
+    {"rate 0", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"playrate", 0}})},
+    {"changed rate", "0:P0 1:P1 3:P3 5:P5 7:P7 ", Nothing, {{2, ClientSets(2)}, {4, ClientSets(-1)}}},
+    {"given stop", "1:P1 2:P2 2:P2 2:P2 2:P2 ", Params({{"framestart", 1}, {"framestop", 2}})},
+    {"one frame", "1:P1 1:P1 1:P1 1:P1 1:P1 ", Params({{"framestart", 1}, {"framestop", 1}})},
+    {"stop before start", "2:P2 3:P3 4:P4 5:P5 6:P6 ", Params({{"framestart", 2}, {"framestop", 1}})},
+    {"stop past the end", "0:P0 1:P1 ", Frames(2) + Params({{"framestop", 9}})},
+    {"unreadable", "0:P0 1:P1 ", [](auto& p) { p.broken_frames = {2}; }},
+    {"interval 2", "0:P0 20:P20 40:P40 60:P60 80:P80 ", Params({{"interval", 2}, {"playrate", 4}})},
+    {"interval 0", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"interval", 0}})},
+    {"interval 1", "0:P0 10:P10 20:P20 30:P30 40:P40 ", Params({{"interval", 1}})},
+    {"step 0", "0:P0 0:P0 0:P0 0:P0 0:P0 ", Params({{"interval", 9}}) + kHalfFps},
+    {"changed to 0 and below",
+     "0:P0 3:P3 4:P4 5:P5 6:P6 ",
+     Params({{"playrate", 3}}),
+     {{2, ClientSets(0)}, {4, ClientSets(-2)}}},
+    {"rate refused", "0:P0 1:P1 2:P2 3:P3 4:P4 ", kRefused},
+    {"no pause", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Nothing, {{2, Signal(SIGUSR2)}}},
+    {"stopped before", "", Nothing, {{0, Signal(SIGTERM)}}},
+    {"highest rate", "0:P0 99:P99 ", Params({{"playrate", INT_MAX}})},
+    {"lowest rate", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"playrate", INT_MIN}})},
+    {"highest interval", "0:P0 ", Params({{"interval", INT_MAX}})},
+    {"lowest interval", "0:P0 1:P1 2:P2 3:P3 4:P4 ", Params({{"interval", INT_MIN}})},
+    {"highest frame rate", "0:P0 ", Params({{"interval", 2}}) + [](auto& p) { p.frame_rate = 1e30F; }},
+};
+
+const FramesRow kByTimeRows[] = {
+    {"lowest ids", "P0 P0 P1 P2 P3 ", Params({{"eventid", 1}, {"timestamp", 1}}) + kEvent1},
+    {"start past the last frame of the count", "", Params({{"startTimeMS", 50}}) + kGrown},
+    {"broken output", "P0 P0 P1 P2 P3 ", kBroken},
+    {"to the end", "P0 P0 P1 P2 ", Frames(4)},
+    {"given stop", "P1 P1 P2 ", Params({{"startTimeMS", 15}, {"stopTimeMS", 39}})},
+    {"one frame", "P2 ", Params({{"startTimeMS", 20}, {"stopTimeMS", 25}})},
+    {"stop before start", "P5 P5 ", Frames(7) + Params({{"startTimeMS", 50}, {"stopTimeMS", 30}})},
+    {"start kept in 32 bits", "P0 P0 P1 P2 P3 ", Params({{"startTimeMS", Json::Int64{1} << 32}})},
+    {"rate 4, then past the end", "P0 P3 P7 ", Frames(10) + Params({{"playrate", 4}})},
+    {"rate -2", "P0 P0 P1 P2 P3 ", Params({{"playrate", -2}})},
+    {"rate 0", "P0 P0 P1 P2 P3 ", Params({{"playrate", 0}})},
+    {"changed rate", "P0 P0 P2 P4 P6 ", Params({{"changerate", 2}}), {{2, ClientSets(2)}, {4, ClientSets(-1)}}},
+    {"no rate to follow", "P0 P0 P1 P2 P3 ", ClientSets(4)},
+    {"paused and resumed", "P0 P0 P0 P0 P1 ", Nothing, {{2, Signal(SIGUSR2)}, {4, Signal(SIGUSR2)}}},
+    {"paused at the first", "P0 P0 P0 P0 P0 ", Nothing, {{1, Signal(SIGUSR2)}}},
+    {"paused before the first", "P0 P0 P0 P1 P2 ", Nothing, {{0, Signal(SIGUSR2)}, {3, Signal(SIGUSR2)}}},
+    {"paused at rate 4", "P0 P3 P6 P9 P12 ", Params({{"playrate", 4}}), {{2, Signal(SIGUSR2)}}},
+    {"paused while sampling", "0:P0 1:P0 2:P1 2:P1 2:P1 ", Params({{"interval", 0}}), {{3, Signal(SIGUSR2)}}},
     {"rate followed while sampling",
-     kByTime,
+     "0:P0 1:P0 2:P1 3:P2 4:P3 ",
      Params({{"interval", 0}, {"changerate", 1}}),
-     {{1, ClientSets(4)}},
-     "0:P0 1:P0 2:P1 3:P2 4:P3 "},
-    {"refused while sampling",
-     kByTime,
-     Params({{"interval", 0}}) + [](auto& p) { p.progress_result = 1; },
-     {},
-     "0:P0 "},
-    {"stop kept in 32 bits", kByTime, Params({{"stopTimeMS", (Json::Int64{1} << 32) + 39}}), {}, "P0 P0 P1 P2 "},
-    {"paused in the midst", kByTime, Params({{"startTimeMS", 70}}), {{3, Signal(SIGUSR2)}}, "P7 P7 P8 P8 P8 "},
-    {"interval 2",
-     kByTime,
-     Frames(30) + Params({{"interval", 2}, {"playrate", 4}}),
-     {},
-     "0:P0 20:P19 29:P28 29:P28 29:P28 "},
-    {"interval 0", kByTime, Params({{"interval", 0}}), {}, "0:P0 1:P0 2:P1 3:P2 4:P3 "},
-    {"interval 0 to the end", kByTime, Frames(3) + Params({{"interval", 0}}), {}, "0:P0 1:P0 2:P1 2:P1 2:P1 "},
-    {"interval, one frame", kByTime, Frames(1) + Params({{"interval", 0}}), {}, "0:P0 "},
-    {"step 0",
-     kByTime,
-     Params({{"interval", 9}, {"startTimeMS", 20}}) + [](auto& p) { p.frame_rate = 0.5; },
-     {},
-     "2:P2 2:P1 2:P1 2:P1 2:P1 "},
-    {"position refused", kByTime, [](auto& p) { p.progress_result = 1; }, {}, "P0 "},
-    {"rate refused",
-     kByTime,
-     Params({{"changerate", -1}}) + [](auto& p) { p.progress_result = 1; },
-     {},
-     "P0 P0 P1 P2 P3 "},
-    {"stopped before", kByTime, Nothing, {{0, Signal(SIGTERM)}}, ""},
-    {"highest rate", kByTime, Params({{"playrate", INT_MAX}, {"startTimeMS", 50}}), {}, "P5 "},
-    {"lowest rate", kByTime, Params({{"playrate", INT_MIN}}), {}, "P0 P0 P1 P2 P3 "},
-    {"highest interval", kByTime, Params({{"interval", INT_MAX}}), {}, "0:P0 "},
-    {"lowest interval", kByTime, Params({{"interval", INT_MIN}}), {}, "P0 P0 P1 P2 P3 "},
+     {{1, ClientSets(4)}}},
+    {"refused while sampling", "0:P0 ", Params({{"interval", 0}}) + kRefused},
+    {"stop kept in 32 bits", "P0 P0 P1 P2 ", Params({{"stopTimeMS", (Json::Int64{1} << 32) + 39}})},
+    {"paused in the middle", "P7 P7 P8 P8 P8 ", Params({{"startTimeMS", 70}}), {{3, Signal(SIGUSR2)}}},
+    {"interval 2", "0:P0 20:P19 29:P28 29:P28 29:P28 ", Frames(30) + Params({{"interval", 2}, {"playrate", 4}})},
+    {"interval 0", "0:P0 1:P0 2:P1 3:P2 4:P3 ", Params({{"interval", 0}})},
+    {"interval 0 to the end", "0:P0 1:P0 2:P1 2:P1 2:P1 ", Frames(3) + Params({{"interval", 0}})},
+    {"interval, one frame", "0:P0 ", Frames(1) + Params({{"interval", 0}})},
+    {"step 0", "2:P2 2:P1 2:P1 2:P1 2:P1 ", Params({{"interval", 9}, {"startTimeMS", 20}}) + kHalfFps},
+    {"position refused", "P0 ", kRefused},
+    {"rate refused", "P0 P0 P1 P2 P3 ", Params({{"changerate", -1}}) + kRefused},
+    {"stopped before", "", Nothing, {{0, Signal(SIGTERM)}}},
+    {"highest rate", "P5 ", Params({{"playrate", INT_MAX}, {"startTimeMS", 50}})},
+    {"lowest rate", "P0 P0 P1 P2 P3 ", Params({{"playrate", INT_MIN}})},
+    {"highest interval", "0:P0 ", Params({{"interval", INT_MAX}})},
+    {"lowest interval", "P0 P0 P1 P2 P3 ", Params({{"interval", INT_MIN}})},
 };
 
 TEST(Playback, SendsTheRightFrames) {
-    for (const auto& row : kFrames) {
-        SCOPED_TRACE(std::string(row.method) + " " + row.name);
-        Player player(row.method);
+    const auto check = [](const char* method, const FramesRow& row) {
+        SCOPED_TRACE(std::string(method) + " " + row.name);
+        Player player(method);
         row.before(player.platform);
         EXPECT_EQ(player.Run(row.plan, 5), "") << "no redirect once a frame could be read";
         EXPECT_EQ(player.Frames(), row.frames);
@@ -122,6 +109,12 @@ TEST(Playback, SendsTheRightFrames) {
         if (player.platform.params.count("interval") != 0 && player.platform.params["interval"] >= 0) {
             EXPECT_EQ(player.All("Delay("), "") << "sampling never waits";
         }
+    };
+    for (const auto& row : kByIndexRows) {
+        check(kByIndex, row);
+    }
+    for (const auto& row : kByTimeRows) {
+        check(kByTime, row);
     }
 }
 

@@ -32,6 +32,8 @@ struct ProbeHandler : LHHandlerBase<ProbeHandler> {
 };
 
 const Calls kSession = {"IsAuthorized()", "HasAppPriv(VEXO.VDX.Lookhaven)", "IsAdmin()", "GetLoginUserName()"};
+const Calls kAppPriv = {kSession.begin(), kSession.begin() + 2};
+const Calls kAdmin = {kSession.begin(), kSession.begin() + 3};
 const Calls kPeer = {"IsLHRunning()", "GetParam(isCrossSite,0)", "GetParam(client,\"\")"};
 const Calls kPair = {"GetParam(cookie,\"FailedCookie\")", "GetCookie(timestamp,FailedTiemstamp)"};
 const Calls kNoSession = {"IsAuthorized()"};
@@ -54,14 +56,8 @@ void AsPeer(ScriptedPlatform& p, const char* client) {
 }
 
 const AdmissionRow kAdmission[] = {
-    {"application privilege",
-     [](auto& p) { p.is_authorized = p.has_app_priv = true; },
-     true,
-     {kSession.begin(), kSession.begin() + 2}},
-    {"administrator",
-     [](auto& p) { p.is_authorized = p.is_admin = true; },
-     true,
-     {kSession.begin(), kSession.begin() + 3}},
+    {"application privilege", [](auto& p) { p.is_authorized = p.has_app_priv = true; }, true, kAppPriv},
+    {"administrator", [](auto& p) { p.is_authorized = p.is_admin = true; }, true, kAdmin},
     {"the service's own account", [](auto& p) { p.is_authorized = true, p.user_name = "Lookhaven"; }, true, kSession},
     {"the user's privilege", [](auto& p) { p.is_authorized = p.has_user_priv = true; }, true,
      kSession + UserPriv("eve")},
@@ -102,13 +98,13 @@ TEST(Authenticate, AsksInOrderAndNoMoreThanItNeeds) {
 TEST(PrivProfile, IsLoadedOnceForTheLoginOrForAPeer) {
     for (const bool is_peer : {false, true}) {
         ScriptedPlatform platform;
-        platform.params["privData"]["a"] = 1;
+        platform.params["privData"]["privilege"] = 3;
         ProbeHandler handler(platform);
         handler.m_bPairAuth = is_peer;
         PrivProfile* const profile = handler.GetPrivProfile();
-        EXPECT_EQ(profile->GetId(), 1);
+        EXPECT_EQ(profile->GetPrivilege(), 3) << "narrowed from 2";
         EXPECT_EQ(handler.GetPrivProfile(), profile);
-        const Calls load = {"GetParam(privData,null)", "UpdateByJson({\"a\":1})"};
+        const Calls load = {"GetParam(privData,null)", "UpdateByJson({\"privilege\":3})"};
         EXPECT_EQ(platform.calls,
                   (is_peer ? Calls{"PrivProfileGetByUid(1024)"} : Calls{"GetLoginUID()", "PrivProfileGetByUid(7)"}) +
                       load);
@@ -264,8 +260,8 @@ TEST(LogFilter, AdmitsByCategoryOrOwnProcess) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         ScriptedPlatform platform;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = row.category_level;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = 1000;
+        platform.log_cfg.m_CategLevel[32] = row.category_level;
+        platform.log_cfg.m_CategLevel[68] = 1000;
         platform.log_cfg.m_PidCount = row.pid_count;
         std::copy(row.pids.begin(), row.pids.end(), platform.log_cfg.m_PidLevel);
         int evaluated = 0;
@@ -287,11 +283,10 @@ TEST(LogFilter, WithoutConfigurationOnlyUnconditionalLines) {
 
 TEST(LogFilter, NamesCategoryAndLevel) {
     ScriptedPlatform platform;
-    platform.log_cfg.m_CategLevel[LOG_CATEG_LIVEVIEW] = 6;
+    platform.log_cfg.m_CategLevel[32] = 6;
     LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL_INFO, "source", "named\n");
-    LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL_WARN, "source", "not named\n");
-    EXPECT_EQ(platform.logs[0].categ + " " + platform.logs[0].level, "liveview info");
-    EXPECT_EQ(platform.logs[1].level, "unknown");
+    LH_TRACE(LOG_CATEG_LIVEVIEW, LOG_LEVEL(3), "source", "not named\n");
+    EXPECT_THAT(platform.calls, ElementsAre("log live/5 named\n", "log live/unknown not named\n"));
 }
 
 }  // namespace

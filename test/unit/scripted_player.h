@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A player of recorded events against the scripted platform: what it calls, what it sends, and what happens meanwhile.
+// Runs a player of recorded events against the scripted platform.
 #pragma once
 
 #include <csignal>
@@ -18,8 +18,6 @@
 #include "test/support/platform/scripted_platform.h"
 
 namespace lookhaven::test {
-
-using Script = std::function<void(ScriptedPlatform&)>;
 
 inline const char* const kByIndex = "PlayMjpegEvent";
 inline const char* const kByTime = "PlayMjpegEventNoFrameId";
@@ -46,21 +44,22 @@ struct Player {
         g_PlayerStop = g_PlayerCheckPid = g_PlayerPause = 0;
         platform.method = method;
         platform.session_id = kSession;
-        platform.log_cfg.m_CategLevel[LOG_CATEG_PLAYER] = LOG_LEVEL_ERR;
+        platform.log_cfg.m_CategLevel[68] = 1;
         platform.events[3] = MakeEvent(3, 100, 110);
         platform.params = {{"eventid", 3}, {"timestamp", 5}};
     }
     ~Player() { std::remove(kPidFile.c_str()); }
 
-    // What standard output got. At a picture's number, counted from 1, happens what is planned for it; 0: before the
-    // first. SIGTERM comes at the last one.
-    std::string Run(const std::map<int, Script>& plan, int last_picture) {
+    // Returns what was written to standard output. plan: changes by the number of the picture, from 1, at which they
+    // happen; 0: before the first; -2: in the wait after the second. SIGTERM is raised at the last picture.
+    std::string Run(const std::map<int, Change>& plan, int last_picture) {
         int pictures = 0;
         platform.on_call = [&](const std::string& call) {
             const bool is_picture = call.rfind("Write(image/jpeg", 0) == 0;
             pictures += is_picture;
-            const auto planned = plan.find(pictures);
-            if ((is_picture || call == "BeginTiming()") && planned != plan.end()) {
+            const bool is_wait = call == "Delay()";
+            const auto planned = plan.find(is_wait ? -pictures : pictures);
+            if ((is_picture || is_wait || call == "BeginTiming()") && planned != plan.end()) {
                 planned->second(platform);
             }
             if (is_picture && pictures == last_picture) {
@@ -74,7 +73,7 @@ struct Player {
         return capture.Text();
     }
 
-    // What stands between the text and the next comma or bracket in each call that begins with it, joined.
+    // Of each call that begins with the text, what follows it up to the next comma or bracket; joined.
     std::string All(const std::string& text) const {
         std::string all;
         for (const auto& call : calls) {
@@ -85,7 +84,7 @@ struct Player {
         return all;
     }
 
-    // What was sent: 4:P4 for a picture behind its index, P4 for one without.
+    // The pictures sent: 4:P4 for one after its index, P4 for one without.
     std::string Frames() const {
         std::string frames;
         for (const auto& call : calls) {
@@ -102,26 +101,15 @@ struct Player {
     Calls calls;
 };
 
-inline Script Params(const std::map<std::string, Json::Value>& params) {
-    return [params](ScriptedPlatform& p) {
-        for (const auto& [name, value] : params) {
-            p.params[name] = value;
-        }
-    };
-}
-inline Script Frames(int count) {
+inline Change Frames(int count) {
     return [count](ScriptedPlatform& p) { p.frame_count = count; };
 }
-inline Script ClientSets(int number) {
+inline Change ClientSets(int number) {
     return [number](ScriptedPlatform& p) { p.client_number = number; };
 }
-inline Script Signal(int signal) {
+inline Change Signal(int signal) {
     return [signal](ScriptedPlatform&) { std::raise(signal); };
 }
-inline Script operator+(const Script& first, const Script& second) {
-    return [=](ScriptedPlatform& p) { first(p), second(p); };
-}
-inline void Nothing(ScriptedPlatform&) {}
 
 inline const Calls kSignals = {"sigaction(15,0,no mask)", "sigaction(10,0,no mask)", "sigaction(12,0,no mask)"};
 inline const Calls kOpen = {"Event::Load(3,0,0,0)", "IsFileExist(/rec/3)", "ProgressIndicator(5,1,1)",

@@ -15,7 +15,7 @@ bool ChkPidLevel(LOG_LEVEL level) {
         g_DbgLogPid = getpid();
     }
     int threshold = 0;
-    // Another process writes the count: never trust it beyond the table.
+    // Another process writes the count: it must not lead beyond the table.
     const int count = std::min(g_pDbgLogCfg->m_PidCount, DBG_LOG_PID_COUNT);
     for (int i = 0; i < count; ++i) {
         const DbgLogPidLevel& entry = g_pDbgLogCfg->m_PidLevel[i];

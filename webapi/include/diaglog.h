@@ -1,16 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Diagnostic lines: always written for errors, else only when the debug-log configuration asks for category and level.
+// Diagnostic log lines: unconditional ones for errors, and filtered ones, written only when the debug-log configuration
+// admits their category and level.
 //
-// Why so        Streams trace each frame. A line that nobody asked for must cost two comparisons, so the filter is a macro
-//               and a line's arguments are evaluated only after it.
+// Why so        Streams trace each frame. A line that is not admitted must cost two comparisons only, so the filter is
+//               a macro, and the line's arguments are evaluated after it.
 // Thread safety Any thread.
 #pragma once
 
 #include "platform/log/dbglogcfg.h"
 #include "platform/log/lhprintf.h"
 
-// True when the configuration has a threshold for this very process and level is not above it.
+// True when the configuration has a threshold for this process and level is not above it.
 bool ChkPidLevel(LOG_LEVEL level);
 
 // The name of a category or level, "unknown" for a value without one. Lives as long as the process.
@@ -26,10 +27,10 @@ inline bool IsLogAdmitted(LOG_CATEG categ, LOG_LEVEL level) {
 
 // An unconditional line. source: a name without extension; then a printf format and its arguments.
 #define LH_LOG(source, ...) LH_LOG_AT(source, __LINE__, __func__, __VA_ARGS__)
-// The same under the line number and function that the log's readers know it by.
+// The same with a given line number and function, where these are part of the log's format.
 #define LH_LOG_AT(source, line, func, ...) LHPrintf(LOG_TYPE_DEFAULT, nullptr, nullptr, source, line, func, __VA_ARGS__)
 
-// A filtered line; no argument behind level is evaluated when it is not admitted.
+// A filtered line; no argument after level is evaluated unless it is admitted.
 #define LH_TRACE(categ, level, source, ...) LH_TRACE_AT(categ, level, source, __LINE__, __func__, __VA_ARGS__)
 #define LH_TRACE_AT(categ, level, source, line, func, ...)                                                             \
     do {                                                                                                               \

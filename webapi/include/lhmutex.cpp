@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A plain mutex whose destructor waits for the thread that still holds it.
+// A plain mutex whose destructor waits for the thread that holds it.
 #include "webapi/include/lhmutex.h"
 
 LHMutex::LHMutex() {

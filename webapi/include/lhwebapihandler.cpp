@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The two ways of admission: login session, and cookie pair of a peer device.
+// The two ways of admission: by login session, and by the cookie pair of a peer device.
 #include "webapi/include/lhwebapihandler.h"
 
 #include "platform/admission/pairauth.h"
@@ -34,7 +34,7 @@ bool IsAdmittedByPair(const VEXO::APIRequest& request) {
     if (!IsPeerDevice(client) || !isRunning) {
         return false;
     }
-    // The placeholders for missing values are not empty: it is the matcher that must turn them away.
+    // The placeholders for missing values are not empty: the matcher has to reject them.
     const std::string cookie = request.GetParam("cookie", "FailedCookie").asString();
     const std::string timestamp = request.GetCookie("timestamp", "FailedTiemstamp");
     if (cookie.empty() || timestamp.empty()) {

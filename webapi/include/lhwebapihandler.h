@@ -3,8 +3,8 @@
 // Base of every request handler: the request and response, admission, the caller's privilege profile, the error record.
 //
 // Invariants    (1) m_pPrivProfile is set at most once, under m_Mutex.
-//               (2) The profile dies before m_Mutex, which dies before m_ErrParams: hence the order of the members.
-// Thread safety One thread, but for GetPrivProfile, which any thread of the request may call.
+//               (2) m_pPrivProfile is destroyed before m_Mutex, and that before m_ErrParams.
+// Thread safety One thread, except GetPrivProfile, which any thread of the request may call.
 #pragma once
 
 #include <cstdint>
@@ -39,8 +39,8 @@ bool IsAdmittedByPair(const VEXO::APIRequest& request);
 
 }  // namespace lookhaven::webapi
 
-// Handler: the derived class. The other parameters are the types of its members that would relay a request to a managed
-// host; they only belong to the class's identity, for this module relays nothing.
+// Handler: the derived class. The other parameters are the types of its members that would relay a request to a
+// recording server; they are part of the class's identity only, since this module relays nothing.
 template <typename Handler, typename RelayToTarget, typename Relay, typename RelayWithFlag>
 class LHWebAPIHandler {
   public:
@@ -52,7 +52,7 @@ class LHWebAPIHandler {
     LHWebAPIHandler(const LHWebAPIHandler&) = delete;
     LHWebAPIHandler& operator=(const LHWebAPIHandler&) = delete;
 
-    // True when the camera may be changed from here: on a managing host, or when it is this host's own.
+    // True when the camera may be changed from this host: it is a managing host, or owns the camera.
     virtual bool IsCamAvailiable(int camId) {
         if (IsCmsHost() || GetCamOwnerHxId(camId) == 0) {
             return true;
@@ -62,17 +62,18 @@ class LHWebAPIHandler {
         return false;
     }
 
-    // The rights to send along with a redirected request: none.
+    // The rights to send with a redirected request: none.
     virtual Json::Value GetRedirectPrivData(int) { return {}; }
 
-    // Takes the "relayedCmd" parameter; only a managing host believes it.
+    // Reads the "relayedCmd" parameter, which only counts on a managing host.
     void TakeRelayedCmd() {
         const bool relayed = m_pRequest->GetParam("relayedCmd", false).asBool();
         m_bRelayed = IsCmsHost() && relayed;
     }
 
   protected:
-    // Admits the caller by login session, else by cookie pair. False: the caller is to be turned away.
+    // Admits the caller by login session, else by cookie pair. False: the caller is rejected; nothing is logged or
+    // answered.
     bool Authenticate() {
         if (lookhaven::webapi::IsAdmittedBySession(*m_pRequest)) {
             return true;
@@ -87,8 +88,8 @@ class LHWebAPIHandler {
     // The user whose rights count for this request.
     unsigned int GetPrivUid() const { return m_bPairAuth ? PAIR_AUTH_UID : m_pRequest->GetLoginUID(); }
 
-    // The caller's profile, narrowed by the "privData" parameter; loaded on the first call, the same object ever after.
-    // Never null; lives as long as the handler.
+    // The caller's profile, restricted by the "privData" parameter; loaded on the first call, the same object from then
+    // on. Never null; lives as long as the handler. Not for handlers that must ignore "privData".
     PrivProfile* GetPrivProfile() {
         const std::lock_guard<LHMutex> lock(m_Mutex);
         if (!m_pPrivProfile) {
@@ -106,7 +107,7 @@ class LHWebAPIHandler {
         m_ErrParams[2] = std::move(param2);
     }
 
-    // Answers with the recorded error if there is one, else with data.
+    // Answers with the recorded error if there is one, otherwise with data.
     void Answer(const Json::Value& data) {
         if (m_ErrCode == LH_WEBAPI_ERR_NONE) {
             m_pResponse->SetSuccess(data);

@@ -43,9 +43,10 @@ class EmapBinding : public testing::Test {
         users.DenyItem(2, DeniableItem::kEmap, 1);
         users.DenyItem(2, DeniableItem::kDoor, 4);
         users.DenyItem(2, DeniableItem::kIoModule, 5);
-        store::Cameras(records_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+        store::Cameras(records_).Add({.name = "Gate", .ptz = true, .profiles = {{.source = "test:mjpeg"}}});
         servers_.Add({.name = "Annex", .address = "192.0.2.7", .port = 8080, .certificate = kCertificate}, kSecret);
-        servers_.PutCamera({.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = base::Codec::kH264});
+        servers_.PutCamera(
+            {.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = base::Codec::kH264, .audio = true});
         emaps_.Add({.name = "Ground floor"});
         Call(1);
     }
@@ -165,6 +166,9 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
     ASSERT_EQ(camera.LoadByIdOnRecServer(1, 1), 0);
     EXPECT_EQ(camera.m_Id * 10 + camera.m_VideoType, 23);
     EXPECT_EQ(camera.m_OwnerDevName, "Annex");
+    EXPECT_EQ(std::pair(camera.m_AudioType, camera.m_DeviceType), std::pair(1, 0));
+    ASSERT_EQ(camera.Load(1, 0, 0), 0);
+    EXPECT_EQ(std::pair(camera.m_AudioType, camera.m_DeviceType), std::pair(0, 2));
     devices_.SetCameraPorts(2, {4, 2});
     EXPECT_EQ(GetCamDetMap("1,2").at(2).GetDICnt(), 4);
     EXPECT_EQ(GetCamDOMap("1,2").size(), 1U);

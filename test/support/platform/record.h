@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How the double's functions find their script and record themselves.
+// Access to the current script, and the recording of calls, for the functions of the double.
 #pragma once
 
 #include <sstream>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's cameras, live streams and multipart output on a script.
+// Test double of the platform's cameras, live streams and multipart output.
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
@@ -14,6 +14,7 @@ using lookhaven::test::AudioRing;
 using lookhaven::test::Call;
 using lookhaven::test::Script;
 using lookhaven::test::ScriptedFrame;
+using lookhaven::test::ScriptedFrames;
 using lookhaven::test::Sound;
 
 namespace lookhaven::test {
@@ -42,8 +43,8 @@ Camera::Camera()
       m_VideoType(0),
       m_LiveProfile(0),
       m_StreamNo{},
-      m_blPtz(false),
-      m_blAudio(false) {}
+      m_AudioType(CAM_AUDIO_NONE),
+      m_DeviceType(CAM_DEVICE_UNKNOWN) {}
 int Camera::Load(int camId, int serverId, int archiveId) {
     Call("Load", camId, serverId, archiveId);
     const auto found = Script().cameras.find(camId);
@@ -90,7 +91,7 @@ int DevCapHandler::LoadByCam(const Camera& camera) {
     Call("LoadByCam", camera.m_Id);
     const Sound sound = Script().sound[camera.m_Id];
     m_pDevice = std::make_unique<DPObjectBase>();
-    // Twice a yes, so that a number is not passed on in place of one.
+    // Not 1, to tell a truth value from a number that is passed on.
     m_pSoundSupport = std::make_unique<SoundFunctor>(sound == Sound::kYes ? 2 : 0);
     if (sound == Sound::kWrongType) {
         m_pSoundSupport = std::make_unique<MemFuncBase>();
@@ -98,7 +99,7 @@ int DevCapHandler::LoadByCam(const Camera& camera) {
     m_SoundSupport.m_pTarget = sound == Sound::kNoTarget ? nullptr : m_pDevice.get();
     m_SoundSupport.m_pFunctor = sound == Sound::kNoFunctor ? nullptr : m_pSoundSupport.get();
     m_SoundSupport.m_Name = "Sound";
-    return Script().cap_failures.count(camera.m_Id) != 0 ? 1 : 0;
+    return Script().cap_failures.count(camera.m_Id) != 0 ? -1 : 0;
 }
 unsigned int CamCapUtils::GetLiveStmPtzCapByUserName(const DevCapHandler&, const Camera& camera,
                                                      const std::string& userName) {
@@ -110,7 +111,7 @@ LHShmCommonCfg* LHShmCommonCfgAt() {
     return Script().has_common_cfg ? &Script().common_cfg : nullptr;
 }
 long GetMonoTimeSec() {
-    return static_cast<long>(Script().now);
+    return Script().monotonic_now;
 }
 
 ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
@@ -125,14 +126,15 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
 
 namespace {
 
-// The call's name, for a ring of sound with a word in front.
+// Records the call; the name of one on the audio ring begins with "audio".
 template <typename... Arguments>
 void RingCall(const ShmStreamFifo* ring, const std::string& name, const Arguments&... arguments) {
     Call((ring == AudioRing() ? "audio " + name : name).c_str(), arguments...);
 }
 
-const char* NameOf(const __tag_DATA_ENTRY_INFO* position) {
-    return position == nullptr ? "null" : position == Script().audio_position ? "audio position" : "position";
+std::string NameOf(const __tag_DATA_ENTRY_INFO* position) {
+    const auto found = Script().positions.find(position);
+    return found == Script().positions.end() ? "stray position" : found->second;
 }
 
 const char* NameOf(const DataEntry* entry) {
@@ -156,7 +158,7 @@ DataEntry* Entry(const std::optional<ScriptedFrame>& frame) {
     return entry;
 }
 
-DataEntry* NextOf(std::deque<std::optional<ScriptedFrame>>& frames) {
+DataEntry* NextOf(ScriptedFrames& frames) {
     if (frames.empty()) {
         return nullptr;
     }
@@ -177,14 +179,14 @@ void Give(const std::string& extra, unsigned char* data, int& length) {
 }  // namespace
 
 void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO* position) {
-    Script().audio_position = this == AudioRing() ? position : Script().audio_position;
-    RingCall(this, "StartRead");
+    Script().positions.emplace(position, this == AudioRing() ? "audio position" : "position");
+    RingCall(this, "StartRead", NameOf(position));
 }
 DataEntry* ShmStreamFifo::ReadLatest() {
-    return ReadLatest(-1, nullptr);
+    return RingCall(this, "ReadLatest"), NextPicture();
 }
-DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO*) {
-    return RingCall(this, "ReadLatest", lastSeq), NextPicture();
+DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
+    return RingCall(this, "ReadLatest", lastSeq, NameOf(position)), NextPicture();
 }
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     RingCall(this, "ReadNext", lastSeq, NameOf(position));
@@ -199,8 +201,9 @@ void ShmStreamFifo::ReadIFrameFinish(DataEntry* entry, __tag_DATA_ENTRY_INFO* po
 void ShmStreamFifo::ReadFinish(DataEntry* entry, bool flag, __tag_DATA_ENTRY_INFO* position) {
     RingCall(this, "ReadFinish", NameOf(entry), flag, NameOf(position));
 }
-void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO*) {
-    RingCall(this, "StopRead");
+void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
+    RingCall(this, "StopRead", NameOf(position));
+    Script().positions.erase(position);
 }
 void ShmStreamFifo::GetVdoExtraData(unsigned char* data, int& length) {
     RingCall(this, "GetVdoExtraData", length);
@@ -230,7 +233,7 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
     const std::string text(static_cast<const char*>(data), length < 100 ? static_cast<std::size_t>(length) : 0);
     Call("Write", contentType, data == nullptr ? "null" : text, length, extra == nullptr ? "null" : extra);
     m_blHeadSent = true;
-    return 0;
+    return Script().write_result;
 }
 int MultipartResponse::Write(const char* contentType, const char* codecs, const unsigned char* videoExtra,
                              int videoExtraLength, const unsigned char* audioExtra, int audioExtraLength,
@@ -240,5 +243,5 @@ int MultipartResponse::Write(const char* contentType, const char* codecs, const 
     };
     Call("Write", contentType, codecs, text(videoExtra, videoExtraLength), text(audioExtra, audioExtraLength),
          timestamp, text(data, length), length, extra == nullptr ? "null" : extra);
-    return 0;
+    return Script().write_result;
 }

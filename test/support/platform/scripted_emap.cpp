@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's e-maps and their devices on a script. A device that server 2 owns has here the id 200 and its id there;
-// camera 1 has two inputs and one output, port 0 of module 7 is of type 4.
+// Test double of the platform's e-maps and their devices. A device of server 2 has the local id 200 + its id there;
+// camera 1 has two inputs and one output, port 0 of module 7 has type 4.
 #include "platform/admission/slavehx.h"
 #include "platform/emap/device.h"
 #include "platform/emap/emap.h"
@@ -12,8 +12,8 @@ using lookhaven::test::Script;
 
 namespace {
 
-bool IsUnknown(int id) {
-    return Script().unknown_devices.count(id) != 0;
+int Known(int id) {
+    return Script().unknown_devices.count(id) != 0 ? -1 : 0;
 }
 
 }  // namespace
@@ -52,7 +52,7 @@ int Camera::LoadByIdOnRecServer(int idOnServer, int serverId) {
 int IOModule::Load(int moduleId) {
     m_Id = moduleId;
     m_Name = "io" + std::to_string(moduleId);
-    return Call("IOModule::Load", moduleId), IsUnknown(moduleId);
+    return Call("IOModule::Load", moduleId), Known(moduleId);
 }
 int IOModule::LoadByIdOnRecServer(int idOnServer, int serverId) {
     return Load(100 * serverId + idOnServer);
@@ -65,7 +65,7 @@ std::string IOModule::GetName() const {
 }
 int POS::Load(int posId) {
     m_PairedCamIdOnRec = posId + 1;
-    return Call("POS::Load", posId), IsUnknown(posId);
+    return Call("POS::Load", posId), Known(posId);
 }
 int POS::LoadByIdOnRecServer(int idOnServer, int serverId) {
     return Load(100 * serverId + idOnServer);
@@ -91,9 +91,11 @@ int GetIOModuleIdOnHost(int serverId, int idOnServer) {
     return 100 * serverId + idOnServer;
 }
 void GetPairedCam(int moduleId, int portIdx, int& camId, int& camServerId, int& camIdOnServer) {
-    camId = moduleId + 10 + portIdx;
-    camServerId = 2;
-    camIdOnServer = moduleId;
+    if (portIdx >= 0) {  // otherwise no camera is paired, and nothing is stored
+        camId = moduleId + 10 + portIdx;
+        camServerId = 2;
+        camIdOnServer = moduleId;
+    }
 }
 
 SlaveHx::SlaveHx(std::string ip, int port, std::string cookie)

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The script's life, and the platform's request, admission, privilege and log on it.
+// Test double of the platform's request, admission, privileges and log; construction and destruction of the script.
 #include "test/support/platform/scripted_platform.h"
 
 #include <cstdarg>
@@ -55,7 +55,7 @@ ScriptedPlatform::ScriptedPlatform() {
     pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_ERRORCHECK);
     pthread_mutex_init(&common_cfg.m_Mutex, &attributes);
     pthread_mutexattr_destroy(&attributes);
-    common_cfg.m_Timestamp = now;
+    common_cfg.m_Timestamp = monotonic_now;
     common_cfg.m_blPause = 0;
     g_pDbgLogCfg = &log_cfg;
     g_DbgLogPid = 0;
@@ -141,7 +141,7 @@ Json::Value APIRequest::GetParam(const std::string& name, const Json::Value& def
     if (found != Script().params.end()) {
         return found->second;
     }
-    // The framework takes a text for JSON when it is nothing else, a default too.
+    // As the framework does, turns a text that is a number into one, a default too.
     const bool is_number = defaultValue.isString() && !defaultValue.asString().empty() &&
                            defaultValue.asString().find_first_not_of("-0123456789") == std::string::npos;
     return is_number ? Json::Value(std::stoi(defaultValue.asString())) : defaultValue;
@@ -234,11 +234,15 @@ std::set<int> PrivProfile::GetInaEmapIdSet(ITEM_PRIV_TYPE type, bool withHidden)
 std::set<int> PrivProfile::GetInaIOIdSet(bool withHidden) const {
     return Call("GetInaIOIdSet", withHidden), Script().denied_modules;
 }
-bool IsDoorPrivAllowed(const PrivProfile&, DOOR_PRIV_TYPE type, int doorId) {
-    return Call("IsDoorPrivAllowed", type, doorId), Script().denied_doors.count(doorId) == 0;
+bool IsDoorPrivAllowed(const PrivProfile& profile, DOOR_PRIV_TYPE type, int doorId) {
+    Call("IsDoorPrivAllowed", type, doorId, profile.GetPrivilege());
+    return Script().denied_doors.count(doorId) == 0;
 }
 void PrivProfile::UpdateByJson(const Json::Value& privData) {
     Call("UpdateByJson", Text(privData));
+    auto narrowed = std::make_shared<Data>(*m_pData);
+    narrowed->privilege = privData.get("privilege", narrowed->privilege).asInt();
+    m_pData = narrowed;
 }
 PrivProfile PrivProfileGetByUid(unsigned int uid) {
     Call("PrivProfileGetByUid", uid);
@@ -255,13 +259,13 @@ void LHPrintf(LOG_TYPE, const char* categName, const char* levelName, const char
     std::vsnprintf(text, sizeof text, fmt, arguments);
     va_end(arguments);
     const auto name = [](const char* value) { return value == nullptr ? "null" : value; };
+    const std::string gate = categName == nullptr ? "" : std::string(categName) + "/" + name(levelName) + " ";
     Script().logs.push_back({name(categName), name(levelName), file, line, func, text});
-    Script().Record(std::string("log ") + text);
+    Script().Record("log " + gate + text);
 }
 template <>
-LHEnum2StrMap<LOG_CATEG>::LHEnum2StrMap() : m_Names{{LOG_CATEG_LIVEVIEW, "liveview"}, {LOG_CATEG_PLAYER, "player"}} {}
-// Leaves LOG_LEVEL_WARN out: a value without a name.
+LHEnum2StrMap<LOG_CATEG>::LHEnum2StrMap() : m_Names{{LOG_CATEG(32), "live"}, {LOG_CATEG(68), "player"}} {}
+// Level 3 has no name.
 template <>
 LHEnum2StrMap<LOG_LEVEL>::LHEnum2StrMap()
-    : m_Names{
-          {LOG_LEVEL_ERR, "err"}, {LOG_LEVEL_NOTICE, "notice"}, {LOG_LEVEL_INFO, "info"}, {LOG_LEVEL_DEBUG, "debug"}} {}
+    : m_Names{{LOG_LEVEL(1), "1"}, {LOG_LEVEL(4), "4"}, {LOG_LEVEL(5), "5"}, {LOG_LEVEL(6), "6"}} {}

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A platform that answers from a script and writes down, in order, what the module asked of it and of the system.
+// Test double of the platform: answers from a script, and records in order the module's calls of it and of the system.
 #pragma once
 
 #include <csignal>
@@ -37,21 +37,26 @@ struct LogLine {
     std::string func, text;
 };
 
-// What one read of a ring gives.
+// The result of one read of a ring.
 struct ScriptedFrame {
     int seq = 1;
-    std::string data = "JPEG";  // the offset's bytes included
+    std::string data = "JPEG";  // including the offset's bytes
     int offset = 0;
     int length = -1;  // -1: of data
     bool is_key = false;
     long long timestamp = 0;
 };
 
+using ScriptedFrames = std::deque<std::optional<ScriptedFrame>>;
+
 enum class Sound { kYes, kNo, kNoTarget, kNoFunctor, kWrongType };
 
-// While one exists it is the platform of the process, and sleep, usleep, time, sigaction, shmdt and the state of
-// standard output are its script's. Every call is first recorded, then shown to on_call, which may change the script or
-// throw.
+class ScriptedPlatform;
+// A change that a test makes to the script.
+using Change = std::function<void(ScriptedPlatform&)>;
+
+// While one exists it is the platform of the process, and decides about sleep, usleep, time, sigaction, shmdt and the
+// state of standard output. Every call is first recorded, then passed to on_call, which may change the script or throw.
 class ScriptedPlatform {
   public:
     ScriptedPlatform();
@@ -62,7 +67,7 @@ class ScriptedPlatform {
     void Record(const std::string& call);
     VEXO::APIRequest* Request();
     VEXO::APIResponse* Response();
-    // The recorded calls from the first that begins with the text on.
+    // The recorded calls, from the first that begins with the text.
     Calls CallsFrom(const std::string& text) const;
 
     Calls calls;
@@ -89,21 +94,21 @@ class ScriptedPlatform {
     std::map<int, Sound> sound;
 
     bool has_stream = true;
-    std::deque<std::optional<ScriptedFrame>> frames;  // when used up, standard output ends
+    ScriptedFrames frames;  // after the last, standard output is at its end
     bool has_audio_stream = true;
-    std::deque<std::optional<ScriptedFrame>> audio_frames;
+    ScriptedFrames audio_frames;
     std::optional<ScriptedFrame> newest_key_frame;
     std::string video_codec = "H264", audio_codec = "AAC", video_extra = "V", audio_extra = "A";
-    const void* audio_position = nullptr;  // the one that reads the audio ring
+    std::map<const void*, std::string> positions = {{nullptr, "null"}};  // readers of a ring, with their names
 
     std::map<int, Event> events;  // for Load, whatever the kind
     bool has_file = true;         // under any name but the empty one
     int init_result = 0, frame_info_result = 0;
     float frame_rate = 10;
-    int frame_count = 100;
+    int frame_count = 100, grown_by = 0;  // as reported, and frames that can be read beyond that
     std::set<int> broken_frames;
     int client_number = -1;  // what the client set on a player's channel
-    int progress_result = 0;
+    int progress_result = 0, timely_play_result = 0;
     bool has_memory = true;  // for a block of 2 MiB
 
     std::list<Event> found_events;
@@ -112,34 +117,49 @@ class ScriptedPlatform {
 
     bool has_emap = true;
     std::string image_name = "floor.old.png";
-    std::vector<std::optional<__tag_EMAP_ITEM_INFO>> emap_items;  // none: cannot be got
+    std::vector<std::optional<__tag_EMAP_ITEM_INFO>> emap_items;  // nullopt: GetItem fails
     std::set<int> unknown_devices, denied_emaps, denied_doors, denied_modules;
 
     LHShmCommonCfg common_cfg;
     bool has_common_cfg = true;
     DbgLogCfg log_cfg = {};
 
-    std::time_t now = 1000000;  // wall clock and monotonic clock; sleeping moves it
+    std::time_t now = 1700000000;  // wall clock; sleeping moves both
+    long monotonic_now = 1000000;
+    int lock_result = 0;  // of common_cfg's mutex, which is locked all the same
     std::set<int> failing_signals;
     bool flush_fails = false;
+    int write_result = 0;  // of multipart output
     bool is_eof = false, is_error = false;
-    const void* watched_mutex = nullptr;  // record what is done with it, and the end of a profile
+    const void* watched_mutex = nullptr;  // its calls are recorded, and destruction of a profile
     std::list<std::vector<std::uint32_t>> entries;
 };
 
 // The one that exists, or null.
 ScriptedPlatform* CurrentPlatform();
 
-// The address that stands for a ring of sound.
+inline void Nothing(ScriptedPlatform&) {}
+inline Change Params(const std::map<std::string, Json::Value>& params) {
+    return [params](ScriptedPlatform& platform) {
+        for (const auto& [name, value] : params) {
+            platform.params[name] = value;
+        }
+    };
+}
+inline Change operator+(const Change& first, const Change& second) {
+    return [=](ScriptedPlatform& p) { first(p), second(p); };
+}
+
+// The address that stands for an audio ring.
 ShmStreamFifo* AudioRing();
 
-// A camera of one stream per profile: 10 · id + profile.
+// A camera with one stream per profile, numbered 10 · id + profile.
 Camera MakeCamera(int id, int video_type, bool enabled = true);
 
-// A recorded event with a file of its own.
+// A saved event with sound.
 Event MakeEvent(int id, int start, int end, int rec_method = REC_METHOD_CONTINUOUS);
 
-// Standard output while it exists goes to a file.
+// Redirects standard output to a file while it exists.
 class StdoutCapture {
   public:
     StdoutCapture();

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's events, recordings and pacing on a script. The picture of frame 7 is "P7", its time 70 ms.
+// Test double of the platform's events, recordings and pacing. The picture of frame 7 is "P7", its time 70 ms.
 #include "platform/recording/event.h"
 #include "platform/recording/jpegextractor.h"
 #include "platform/recording/pacing.h"
@@ -105,7 +105,7 @@ std::uint64_t Event::GetSize() const {
     return m_Size;
 }
 bool Event::IsOriginalView() const {
-    return m_CamId == 8;  // the script's fisheye
+    return m_CamId == 8;  // the fisheye camera
 }
 int AlertEvent::Load(int eventId, int mountId, int serverId, int archiveId) {
     return Find("AlertEvent::Load", eventId, mountId, serverId, archiveId, *this);
@@ -121,7 +121,7 @@ std::string PosEvent::GetFullPath() const {
     return m_Footage.GetFullPath();
 }
 int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type) {
-    return Call("DoEventTimelyPlay", event.m_Id, type), 0;
+    return Call("DoEventTimelyPlay", event.m_Id, type), Script().timely_play_result;
 }
 bool IsFileExist(const std::string& path) {
     return Call("IsFileExist", path), Script().has_file && !path.empty();
@@ -139,7 +139,7 @@ int JpegExtractor::GetFrameInfo(__tag_JPEG_FRAME_INFO& info) {
 }
 int JpegExtractor::ReadFrame(int index, unsigned char* buffer, int& length) {
     Call("ReadFrame", index, length);
-    if (index < 0 || index >= Script().frame_count || Script().broken_frames.count(index) != 0) {
+    if (index < 0 || index >= Script().frame_count + Script().grown_by || Script().broken_frames.count(index) != 0) {
         return -1;
     }
     length = static_cast<int>(("P" + std::to_string(index)).copy(reinterpret_cast<char*>(buffer), 16));

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The platform's event search and sets of cameras on a script.
+// Test double of the platform's event search and sets of cameras.
 #include <algorithm>
 
 #include "platform/camera/camgroup.h"
@@ -23,7 +23,7 @@ std::map<int, Camera> GetCamMountMap(int mountId, const std::string& deniedIds, 
     return Call("GetCamMountMap", mountId, deniedIds, withDeleted), Script().mount_cameras;
 }
 
-// Marks what a handler leaves alone.
+// Values that show which fields a handler leaves at their defaults.
 EventFilterParam::EventFilterParam()
     : m_MountId(-1),
       m_Offset(-1),

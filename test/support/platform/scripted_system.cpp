@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The system calls that a script governs; the linker sends the module's calls here (--wrap). Without a script they pass.
+// The system calls that a script decides about; the linker redirects calls here (--wrap). Without a script they are
+// passed on.
 #include <cerrno>
 #include <cstdio>
 
@@ -49,6 +50,7 @@ unsigned int __wrap_sleep(unsigned int seconds) {
         return __real_sleep(seconds);
     }
     Script().now += static_cast<std::time_t>(seconds);
+    Script().monotonic_now += static_cast<long>(seconds);
     return Call("sleep", seconds), 0;
 }
 int __wrap_usleep(useconds_t microseconds) {
@@ -90,7 +92,9 @@ void* __wrap_malloc(std::size_t size) {
 }
 int __wrap_pthread_mutex_lock(pthread_mutex_t* mutex) {
     RecordMutex("lock", mutex);
-    return __real_pthread_mutex_lock(mutex);
+    const int result = __real_pthread_mutex_lock(mutex);
+    const bool is_scripted = CurrentPlatform() != nullptr && mutex == &Script().common_cfg.m_Mutex;
+    return is_scripted && Script().lock_result != 0 ? Script().lock_result : result;
 }
 int __wrap_pthread_mutex_unlock(pthread_mutex_t* mutex) {
     RecordMutex("unlock", mutex);

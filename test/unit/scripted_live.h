@@ -1,0 +1,82 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Runs live view requests against the scripted platform.
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "player/liveview_src/liveview_src.h"
+#include "test/support/platform/scripted_platform.h"
+
+namespace lookhaven::test {
+
+struct LiveHandler : LiveviewSrcHandler {
+    explicit LiveHandler(ScriptedPlatform& platform) : LiveviewSrcHandler(platform.Request(), platform.Response()) {}
+    using LHWebAPIHandler::m_bPairAuth;
+    using LHWebAPIHandler::m_ErrCode;
+};
+
+// A "Play" request of an admitted caller for camera 5, which streams MJPEG.
+struct LiveView {
+    LiveView() {
+        gblStop = 0;
+        platform.is_authorized = platform.has_app_priv = true;
+        platform.method = "Play";
+        platform.cameras[5] = MakeCamera(5, CAM_VIDEO_MJPEG);
+        platform.params["camera"] = 5;
+    }
+    ~LiveView() { gblStop = 0; }
+
+    ScriptedPlatform platform;
+};
+
+struct LoopRow {
+    const char* name;
+    Change before;
+    std::map<std::string, Change> at;  // what happens at each call of that text
+    Calls calls;                       // from the first StartRead on
+};
+
+inline void Stop(ScriptedPlatform&) {
+    gblStop = 1;
+}
+inline Change Pictures(const ScriptedFrames& frames) {
+    return [frames](ScriptedPlatform& p) { p.frames = frames; };
+}
+inline Change Later(int seconds) {
+    return [seconds](ScriptedPlatform& p) { p.now += seconds; };
+}
+
+// Plays the row as stream 51 of camera 5. func: the handler's function, which each log line names.
+inline void RunLoop(const LoopRow& row, const char* func, const std::function<void(LiveHandler&)>& stream) {
+    SCOPED_TRACE(row.name);
+    LiveView test;
+    ScriptedPlatform& platform = test.platform;
+    platform.log_cfg.m_CategLevel[32] = 5;
+    row.before(platform);
+    platform.on_call = [&](const std::string& call) {
+        const auto planned = row.at.find(call);
+        if (planned != row.at.end()) {
+            planned->second(platform);
+        }
+    };
+    LiveHandler handler(platform);
+    stream(handler);
+    EXPECT_EQ(platform.CallsFrom("StartRead"), row.calls);
+    EXPECT_EQ(handler.m_ErrCode, 0);
+    for (const auto& log : platform.logs) {
+        EXPECT_EQ(log.file + " " + log.func, std::string("liveview_src ") + func);
+    }
+}
+
+// The line that ends the loop.
+inline Calls LoopExit(const char* eof, const char* error, const char* stop) {
+    return {std::string("log live/5 Exit loop [Cam: 5, feof: ") + eof + ", ferror: " + error + ", gblStop: " + stop +
+            "]\n"};
+}
+
+}  // namespace lookhaven::test
