@@ -62,8 +62,8 @@ describe("a player", () => {
   test("a frame that is being decoded at a pause is told to be unwanted: picture and number stay the same", async () => {
     let drawn = -1;
     player.show = async (frame, signal) => {
-      if (frame.index === 3) setTimeout(() => player.pause(), 0);
       await new Promise((resolve) => setTimeout(resolve, 5));
+      if (frame.index === 3) player.pause();
       if (!signal.aborted) drawn = frame.index;
     };
     player.open(footage(7), 0, true);
