@@ -20,6 +20,7 @@
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 
+namespace base = lookhaven::base;
 namespace store = lookhaven::store;
 using lookhaven::binding::IdSet;
 using lookhaven::binding::OrFailure;

@@ -15,6 +15,7 @@
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 
+namespace base = lookhaven::base;
 namespace store = lookhaven::store;
 using lookhaven::binding::MayUse;
 using lookhaven::binding::OrFailure;

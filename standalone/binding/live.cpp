@@ -19,6 +19,7 @@
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
 
+namespace base = lookhaven::base;
 namespace control = lookhaven::control;
 namespace ring = lookhaven::ring;
 namespace store = lookhaven::store;
