@@ -13,6 +13,7 @@
 #include "standalone/archive/frame_index.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/base/file_descriptor.h"
+#include "standalone/base/video.h"
 
 using namespace lookhaven;
 

@@ -9,7 +9,6 @@
 #include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace archive;
@@ -80,16 +79,7 @@ TEST(SpanFile, ReadsBackAndRefusesWhatIsNone) {
     }
     for (const std::string& text : bad) {
         Write(path, text);
-        EXPECT_EQ(
-            [&] {
-                try {
-                    return ReadSpan(path).recordings.size();
-                } catch (const ArchiveError&) {
-                    return std::size_t{999};
-                }
-            }(),
-            999U)
-            << text.substr(0, 200);
+        EXPECT_THROW(ReadSpan(path), ArchiveError) << text.substr(0, 200);
     }
     EXPECT_THROW(ReadSpan(folder.Path()), ArchiveError);
     EXPECT_THROW(ReadSpan(folder / "none.span"), std::system_error);
@@ -97,5 +87,4 @@ TEST(SpanFile, ReadsBackAndRefusesWhatIsNone) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -4,10 +4,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/base/video.h"
 #include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace archive;
@@ -134,5 +134,4 @@ TEST_F(FrameIndex, GrowsForAsLongAsItsWriterLives) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

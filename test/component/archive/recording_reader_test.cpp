@@ -12,7 +12,6 @@
 #include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace archive;
@@ -191,5 +190,4 @@ TEST(RecordingReader, FollowsASpanIntoRecordingsThatAreMadeLater) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

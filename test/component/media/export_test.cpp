@@ -16,7 +16,6 @@
 #include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -96,5 +95,4 @@ TEST_F(ExportOf, NothingAndToNobodyFails) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -12,7 +12,6 @@
 #include "test/support/camera/mjpeg_camera.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -61,7 +60,7 @@ TEST(FrameAssembler, PutsPiecesTogether) {
         {"second slice, clock corrected", picture_2, 155, ""},
         {"two pictures of one time", picture, 140, ""},
         {"next picture", picture, 180, picture + rest + picture_2 + picture},
-        {"too large", std::string(kMaxFrameBytes, 'x'), 180, ""},
+        {"too large", std::string(base::kMaxFrameBytes, 'x'), 180, ""},
         {"next picture", idr, 220, ""},
         {"next picture", idr, 260, idr},
     };
@@ -105,5 +104,4 @@ TEST(Still, RefusesWhatIsNoPicture) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -11,7 +11,6 @@
 #include "standalone/media/source.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -44,60 +43,41 @@ std::vector<std::string> Parts(const std::string& boundary, const std::string& a
 TEST(MultipartReader, TakesAnswersOfOddCameras) {
     struct Row {
         const char* name;
-        const char* boundary;
         std::string answer;
         std::vector<std::string> parts;
-        const char* end;
+        const char* end = "end";
+        const char* boundary = "b";
     };
-    std::string endless_head;
+    std::string endless_head = "--b\r\n";
     for (int i = 0; i < 70; ++i) {
         endless_head += "x: y\r\n";
     }
+    const std::string last = "--b\r\nContent-Length: 1\r\n\r\na";  // a usual part, cut after its body
     const Row rows[] = {
-        {"usual",
-         "b",
-         "--b\r\nContent-Length: 3\r\n\r\nabc\r\n--b\r\ncontent-length:2\r\n\r\nde\r\n",
-         {"abc", "de"},
-         "end"},
-        {"no blank line after the part",
-         "b",
-         "--b\nContent-Length: 3\n\nabc--b\nContent-Length: 1\n\nx",
-         {"abc", "x"},
-         "end"},
-        {"dashes in the boundary's name", "--b", "--b\r\nContent-Length: 1\r\n\r\na\r\n", {"a"}, "end"},
+        {"usual", "--b\r\nContent-Length: 3\r\n\r\nabc\r\n--b\r\ncontent-length:2\r\n\r\nde\r\n", {"abc", "de"}},
+        {"no blank line after the part", "--b\nContent-Length: 3\n\nabc--b\nContent-Length: 1\n\nx", {"abc", "x"}},
+        {"dashes in the boundary's name", last + "\r\n", {"a"}, "end", "--b"},
         {"dashes in the boundary's name and before it",
-         "--b",
-         "----b\r\nContent-Length: 1\r\n\r\na\r\n----b\r\nX: y\r\n\r\nde\r\n--b\r\n----b\r\n",
+         "--" + last + "\r\n----b\r\nX: y\r\n\r\nde\r\n--b\r\n----b\r\n",
          {"a", "de\r\n--b"},
-         "end"},
-        {"blank lines before the head", "b", "--b\r\n\r\n\r\nContent-Length: 4\r\n\r\n\r\na\n", {"\r\na\n"}, "end"},
-        {"preamble", "b", "hello\r\n\r\n--b\r\nContent-Length: 1\r\n\r\na\r\n", {"a"}, "end"},
+         "end",
+         "--b"},
+        {"blank lines before the head", "--b\r\n\r\n\r\nContent-Length: 4\r\n\r\n\r\na\n", {"\r\na\n"}},
+        {"preamble", "hello\r\n\r\n" + last + "\r\n", {"a"}},
         {"no lengths",
-         "b",
          "--b\r\nX: y\r\n\r\nabc\r\n--b\r\nX: y\r\n\r\n\r\n\r\n--b\r\n\r\n\xff\n--b\r\n",
-         {"abc", "\r\n", "\xff"},
-         "end"},
-        {"boundary inside a sized part",
-         "b",
-         "--b\r\nContent-Length: 5\r\n\r\n\r\n--b\r\n--b\r\nContent-Length: 1\r\n\r\nz\r\n",
-         {"\r\n--b", "z"},
-         "end"},
-        {"too large, sized",
-         "b",
-         "--b\r\nContent-Length: 9\r\n\r\n123456789\r\n--b\r\nContent-Length: 1\r\n\r\na",
-         {"a"},
-         "end"},
-        {"too large, without length",
-         "b",
+         {"abc", "\r\n", "\xff"}},
+        {"boundary inside a sized part", "--b\r\nContent-Length: 5\r\n\r\n\r\n--b\r\n" + last, {"\r\n--b", "a"}},
+        {"too large, sized", "--b\r\nContent-Length: 9\r\n\r\n123456789\r\n" + last, {"a"}},
+        {"too large, no length",
          "--b\r\nX: y\r\n\r\n" + std::string(50, 'x') + "\r\n--b\r\nX: y\r\n\r\na\r\n--b\r\n",
-         {"a"},
-         "end"},
-        {"length of nonsense", "b", "--b\r\nContent-Length: -7\r\n\r\nab\r\n--b\r\n", {"ab"}, "end"},
-        {"the end", "b", "--b\r\nContent-Length: 1\r\n\r\na\r\n--b--\r\n", {"a"}, "ended"},
-        {"cut short", "b", "--b\r\nContent-Length: 5\r\n\r\nab", {}, "end"},
-        {"no multipart", "b", std::string(100, '\n'), {}, "no multipart"},
-        {"endless line", "b", std::string(5000, 'x'), {}, "overlong"},
-        {"endless head", "b", "--b\r\n" + endless_head, {}, "without an end"},
+         {"a"}},
+        {"length of nonsense", "--b\r\nContent-Length: -7\r\n\r\nab\r\n--b\r\n", {"ab"}},
+        {"the end", last + "\r\n--b--\r\n", {"a"}, "ended"},
+        {"cut short", "--b\r\nContent-Length: 5\r\n\r\nab", {}},
+        {"no multipart", std::string(100, '\n'), {}, "no multipart"},
+        {"endless line", std::string(5000, 'x'), {}, "overlong"},
+        {"endless head", endless_head, {}, "without an end"},
     };
     for (const Row& row : rows) {
         for (const std::size_t step : {1, 7, 10000}) {
@@ -124,5 +104,4 @@ TEST(MultipartReader, FindsTheBoundary) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

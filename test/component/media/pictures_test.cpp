@@ -15,7 +15,6 @@
 #include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -132,5 +131,4 @@ TEST(PictureReader, SurvivesDamagedFrames) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -20,7 +20,6 @@
 #include "test/support/footage/clips.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -241,5 +240,4 @@ TEST(CloseCrashed, SavesWhatIsWholeOfACutOrDamagedRecording) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

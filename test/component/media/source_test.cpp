@@ -13,7 +13,6 @@
 #include "test/support/footage/archive_folder.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using namespace media;
@@ -84,8 +83,7 @@ TEST(Source, AStopRequestEndsAWaitForAStalledCamera) {
     MjpegCamera camera;
     camera.SetMood(MjpegCamera::Mood::kStall);
     std::stop_source stop;
-    const auto source =
-        OpenSource(CameraKinds(), camera.Url(), {.no_data_limit = std::chrono::seconds(100)}, stop.get_token());
+    const auto source = OpenSource(CameraKinds(), camera.Url(), {{}, std::chrono::seconds(100)}, stop.get_token());
     std::jthread stopper([&] { stop.request_stop(); });
     const auto begin = std::chrono::steady_clock::now();
     EXPECT_THROW(source->Next(), SourceError);
@@ -93,5 +91,4 @@ TEST(Source, AStopRequestEndsAWaitForAStalledCamera) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -9,7 +9,6 @@
 #include "standalone/pattern/pattern_source.h"
 
 namespace lookhaven::pattern {
-
 namespace {
 
 TEST(PatternSource, IsProbedLikeACamera) {
@@ -32,5 +31,4 @@ TEST(PatternSource, EndsAtAStopRequest) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::pattern

@@ -45,11 +45,6 @@ class CameraRecorderTest : public testing::Test {
         ASSERT_TRUE(rows_.HasId());
     }
 
-    void Request(const std::function<void(RecordingRequest&)>& change) {
-        change(request_);
-        recorder_.SetRequest(request_);
-    }
-
     void Pass(double seconds, bool with_pictures = true) {
         for (int i = 0; i < static_cast<int>(seconds * kFps); ++i) {
             now_us_ += 1'000'000 / kFps;
@@ -153,23 +148,23 @@ TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     const fs::path hidden = folder_ / "hidden";
     const Row rows[] = {
         {RecordingState::kReady, false, [] {}, [] {}},
-        {RecordingState::kReady, true,
-         [&] { Request([](RecordingRequest& request) { request.plan.mode = store::RecordMode::kNever; }); },
-         [&] { Request([](RecordingRequest& request) { request.plan.mode = store::RecordMode::kAlways; }); }},
+        {RecordingState::kReady, true, [&] { request_.plan.mode = store::RecordMode::kNever; },
+         [&] { request_.plan.mode = store::RecordMode::kAlways; }},
         {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
          [&] { fs::rename(hidden, MountPath(1)); }},
         {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 9); },
          [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 1); }},
-        {RecordingState::kNoMount, true, [&] { Request([](RecordingRequest& request) { request.plan.mount_id = 0; }); },
-         [&] { Request([](RecordingRequest& request) { request.plan.mount_id = 1; }); }},
+        {RecordingState::kNoMount, true, [&] { request_.plan.mount_id = 0; }, [&] { request_.plan.mount_id = 1; }},
     };
     for (const Row& row : rows) {
         SCOPED_TRACE(NameOf(row.state));
         row.happens();
+        recorder_.SetRequest(request_);
         Pass(3, row.with_pictures);
         EXPECT_EQ(recorder_.State(), row.state);
         EXPECT_EQ(recorder_.OpenEvent(), 0);
         row.ends();
+        recorder_.SetRequest(request_);
         is_recorded_again();
     }
     EXPECT_EQ(rooms_wanted_, 0);
@@ -182,14 +177,14 @@ TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
 
 TEST_F(CameraRecorderTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
     OpenStore();
-    Request([](RecordingRequest& request) {
-        request.plan.mode = store::RecordMode::kNever;
-        request.plan.pre_s = 2;
-    });
+    request_.plan.mode = store::RecordMode::kNever;
+    request_.plan.pre_s = 2;
+    recorder_.SetRequest(request_);
     Pass(4.6);
     EXPECT_TRUE(Files().empty());
     const std::int64_t alarm_s = (wall_ahead_ms_ + now_us_ / 1000) / 1000;
-    Request([&](RecordingRequest& request) { request.marks_until_s = alarm_s + 3; });
+    request_.marks_until_s = alarm_s + 3;
+    recorder_.SetRequest(request_);
     Pass(10);
     ASSERT_EQ(Files().size(), 1U);
     const archive::RecordingReader event(Files().front());

@@ -9,7 +9,6 @@
 #include "test/component/recorder/recorder_fixture.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 constexpr int kWidth = 160;
@@ -82,5 +81,4 @@ TEST_F(RecorderTest, WhateverASlowViewerTakesFromARingDecodes) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

@@ -11,7 +11,6 @@
 #include "test/support/camera/mjpeg_camera.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using std::chrono::milliseconds;
@@ -243,5 +242,4 @@ TEST_F(RecorderTest, SilentCameraHasAnEmptyRingOfSound) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test

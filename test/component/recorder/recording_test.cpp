@@ -27,7 +27,6 @@
 #include "test/support/postgres/temporary_postgres.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 using std::chrono::milliseconds;
@@ -218,5 +217,4 @@ INSTANTIATE_TEST_SUITE_P(Engines, RecordingTest, testing::Values("Sqlite", "Post
                          [](const auto& engine) { return engine.param; });
 
 }  // namespace
-
 }  // namespace lookhaven::test

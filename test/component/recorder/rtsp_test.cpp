@@ -12,7 +12,6 @@
 #include "test/component/recorder/recorder_fixture.h"
 
 namespace lookhaven::test {
-
 namespace {
 
 void ExpectStill(const Seen& key_frame, base::Codec codec, media::PictureSize expected = {320, 240}) {
@@ -154,5 +153,4 @@ TEST_F(RtspTest, PictureOfAnotherSizeGoesOnInARingOfItsOwnAndTheSoundStays) {
 }
 
 }  // namespace
-
 }  // namespace lookhaven::test
