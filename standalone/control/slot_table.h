@@ -2,11 +2,11 @@
 //
 // What request processes tell the host about themselves: one slot each, in memory that all of them share.
 //
-// Why so        The host cannot open the store (a fork would break the connection), so only a request process knows whose
-//               session it serves, and only the watcher knows which sessions have ended.
+// Why so        The host cannot open the store (a fork would break the connection), so only a request process knows
+//               whose session it serves, and only the watcher knows which sessions have ended.
 // Invariants    (1) The host alone takes and frees slots; a slot that is free belongs to nobody.
-//               (2) A session handle is written once per use of a slot, before has_session says so; what a player can do,
-//                   before since_us says that there is one.
+//               (2) A session handle is written once per use of a slot, before has_session says so; what a player can
+//                   do, before since_us says that there is one.
 //               (3) Other requests only write down what they want of a player; the host alone signals it.
 // Thread safety Any process.
 #pragma once

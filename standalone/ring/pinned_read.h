@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How one call reads from a ring: it has a place in the reader table, pins an entry there and gives it.
+// One read of a ring: owns a slot of the reader table, pins an entry there and hands it over to the caller.
 //
-// Why so        Some calls come without a position. Each entry that they read takes a place in the table of its own, kept
-//               in a list of this process until the entry is given back: a loose pin.
+// Why so        Some reads come without a position. Each entry that they return takes a reader slot of its own, which a
+//               list of this process keeps until the entry is given back: a process pin.
 #pragma once
 
 #include <atomic>
@@ -15,10 +15,11 @@
 
 namespace lookhaven::ring {
 
-// A place in the reader table for one call: the position's, or one of its own that becomes a loose pin.
-class Reading {
+// Uses the position's reader slot, or without a position one claimed for this read, which becomes a process pin or is
+// released again by the destructor.
+class PinnedRead {
   public:
-    Reading(void* ring, Position* position) : view_(ring), ring_(ring), table_(view_), position_(position) {
+    PinnedRead(void* ring, Position* position) : view_(ring), ring_(ring), table_(view_), position_(position) {
         if (position_ == nullptr) {
             reader_ = table_.Claim();
         } else if (position_->generation == view_.Head().generation) {
@@ -26,28 +27,30 @@ class Reading {
         }
         slot_ = table_.Own(reader_);
     }
-    ~Reading() {
-        if (position_ == nullptr && !kept_) {
+    ~PinnedRead() {
+        if (position_ == nullptr && !handed_over_) {
             table_.Release(reader_);
         }
     }
-    Reading(const Reading&) = delete;
-    Reading& operator=(const Reading&) = delete;
+    PinnedRead(const PinnedRead&) = delete;
+    PinnedRead& operator=(const PinnedRead&) = delete;
 
+    // False when there is no slot: nothing may be read then.
     explicit operator bool() const { return slot_ != nullptr; }
     const SegmentHead& Head() const { return view_.Head(); }
     bool IsLive(std::uint64_t count) const { return count != 0 && view_.Slot(count).count.load() == count; }
 
-    // Pins the entry and gives it; null when it is not in the ring any more.
+    // Pins the entry and returns it; null when it is no longer in the ring.
     const Entry* Pin(std::uint64_t count);
-    // Pins the entry whose count the word names, following the word when the writer overtakes.
-    const Entry* PinNamedBy(const std::atomic<std::uint64_t>& word);
+    // Pins the entry whose count is in the word, which is read again when the writer has overwritten the entry
+    // meanwhile.
+    const Entry* PinCurrent(const std::atomic<std::uint64_t>& word);
 
-    // The count that the caller read last, as far as it can be told; 0 for none.
+    // The count of the entry that the caller read last, from the position or else from its number; 0 when unknown.
     std::uint64_t LastCount(int last_sequence) const;
 
   private:
-    void Keep(const Entry* entry, std::uint64_t count);
+    void HandOver(const Entry* entry, std::uint64_t count);
 
     View view_;
     void* ring_;
@@ -55,13 +58,13 @@ class Reading {
     Position* position_;
     int reader_ = -1;
     ReaderSlot* slot_ = nullptr;
-    bool kept_ = false;
+    bool handed_over_ = false;
 };
 
-// Gives back the loose pin of the entry, or with null all that this process has in the ring.
-void ReleaseLoosePins(void* ring, const Entry* only_entry);
+// Releases the process pin of the entry, or with null all that this process has in the ring.
+void ReleaseProcessPins(void* ring, const Entry* only_entry);
 
-// Forgets loose pins of an earlier attachment at that address, without touching the ring that is there now.
-void ForgetLoosePins(const void* ring);
+// Forgets the process pins of an earlier attachment at that address, without touching the ring that is there now.
+void ForgetProcessPins(const void* ring);
 
 }  // namespace lookhaven::ring

@@ -75,7 +75,7 @@ Viewer::Viewer(const base::Installation& installation, int camera, base::Medium 
       demand_(installation) {}
 
 bool Viewer::Attach() {
-    demand_.Touch({id_.camera, id_.stream});
+    demand_.Request({id_.camera, id_.stream});
     if (ring_ != nullptr && ring::IsRetired(ring_)) {
         Leave();
     }

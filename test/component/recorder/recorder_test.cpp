@@ -98,7 +98,7 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
         {page.Url(), "does not answer with Motion JPEG"},
     };
     for (const auto& [source, message] : bad) {
-        demand.Touch({AddCamera(source), 0});
+        demand.Request({AddCamera(source), 0});
     }
     const Child recorder = StartRecorder();
     for (const auto& [source, message] : bad) {
@@ -168,8 +168,8 @@ TEST_F(RecorderTest, EndsInOrder) {
     stalled.SetMood(MjpegCamera::Mood::kStall);
     Viewer live(*installation_, AddCamera("test:h264?size=160x120&audio=aac"));
     control::Demand demand(*installation_);
-    demand.Touch({AddCamera(stalled.Url()), 0});
-    demand.Touch({AddCamera("http://127.0.0.1:1/"), 0});
+    demand.Request({AddCamera(stalled.Url()), 0});
+    demand.Request({AddCamera("http://127.0.0.1:1/"), 0});
     for (const int signal : {SIGTERM, SIGINT}) {
         Child recorder = StartRecorder("60");
         ASSERT_TRUE(Eventually([&] { return live.HasPicture() && stalled.Connections() == 1; }));

@@ -135,7 +135,7 @@ TEST_F(LifecycleTest, ARingThatIsTooSmallMovesToALargerOneAndALaterReaderFindsIt
     Detach(ring);
 }
 
-TEST_F(LifecycleTest, KilledReadersHoldNeitherRoomNorPlaces) {
+TEST_F(LifecycleTest, KilledReadersKeepNeitherSpaceNorSlots) {
     Writer writer = MakeWriter();
     void* ring = Attach(installation_, kId);
     Write(writer, 1);
@@ -144,7 +144,7 @@ TEST_F(LifecycleTest, KilledReadersHoldNeitherRoomNorPlaces) {
         for (Position& position : positions) {
             StartRead(ring, &position);
             if (ReadLatest(ring, kNoSequence, &position, 0) == nullptr) {
-                throw std::runtime_error("no place");
+                throw std::runtime_error("no slot");
             }
         }
     };
@@ -283,9 +283,9 @@ TEST_F(LifecycleTest, OnlyOrphansAreRemoved) {
 TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
     struct Row {
         StreamEstimate estimate;
-        std::uint64_t least_bytes;
-        std::uint64_t most_bytes;
-        std::uint32_t least_slots;
+        std::uint64_t min_bytes;
+        std::uint64_t max_bytes;
+        std::uint32_t min_slots;
     };
     for (const Row& row : {
              Row{{Medium::kVideo, true, 200'000LL * 8 * 25, 200'000, 25}, 15'000'000, 34'000'000, 75},
@@ -296,9 +296,9 @@ TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
              Row{{Medium::kVideo, true, std::int64_t{1} << 60, std::int64_t{1} << 60, 1e9}, 1 << 28, 1 << 28, 8'192},
          }) {
         const Geometry geometry = GeometryFor(row.estimate);
-        EXPECT_GE(geometry.arena_bytes, row.least_bytes);
-        EXPECT_LE(geometry.arena_bytes, row.most_bytes);
-        EXPECT_GE(geometry.index_slots, row.least_slots);
+        EXPECT_GE(geometry.arena_bytes, row.min_bytes);
+        EXPECT_LE(geometry.arena_bytes, row.max_bytes);
+        EXPECT_GE(geometry.index_slots, row.min_slots);
         EXPECT_LE(geometry.index_slots, 8'192U);
     }
 }
