@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <chrono>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <system_error>
 #include <thread>
@@ -68,35 +69,22 @@ Table FindOrMakeRecord(const std::filesystem::path& path) {
     });
 }
 
-// Holds the record's mutex, also one whose owner died. Tried for a second: others hold it for a few loads, so one that
-// is still held then belongs to a stopped process.
-class Lock {
-  public:
-    explicit Lock(pthread_mutex_t& mutex) : mutex_(mutex) {
-        for (int tries = 0; tries < 1000; ++tries) {
-            const int error = pthread_mutex_trylock(&mutex);
-            if (error == EBUSY) {
-                std::this_thread::sleep_for(std::chrono::milliseconds(1));
-                continue;
-            }
-            held_ = error == 0 || (error == EOWNERDEAD && pthread_mutex_consistent(&mutex) == 0);
-            return;
-        }
-    }
-    ~Lock() {
-        if (held_) {
-            pthread_mutex_unlock(&mutex_);
-        }
-    }
-    Lock(const Lock&) = delete;
-    Lock& operator=(const Lock&) = delete;
-
-    explicit operator bool() const { return held_; }
-
-  private:
-    pthread_mutex_t& mutex_;
-    bool held_ = false;
+struct Unlock {
+    void operator()(pthread_mutex_t* mutex) const { pthread_mutex_unlock(mutex); }
 };
+using Lock = std::unique_ptr<pthread_mutex_t, Unlock>;
+
+// Locks the record's mutex, also one whose owner died. Null after a second: others hold it for a few loads, so one that
+// is still held then belongs to a stopped process.
+Lock TryLock(pthread_mutex_t& mutex) {
+    int error = pthread_mutex_trylock(&mutex);
+    for (int tries = 1; error == EBUSY && tries < 1000; ++tries) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        error = pthread_mutex_trylock(&mutex);
+    }
+    const bool is_held = error == 0 || (error == EOWNERDEAD && pthread_mutex_consistent(&mutex) == 0);
+    return Lock(is_held ? &mutex : nullptr);
+}
 
 }  // namespace
 
@@ -105,7 +93,7 @@ CommonConfigKeeper::CommonConfigKeeper(const base::Installation& installation)
 
 bool CommonConfigKeeper::Refresh(bool paused) {
     CommonConfig& config = table_->config;
-    const Lock lock(config.mutex);
+    const Lock lock = TryLock(config.mutex);
     if (!lock) {
         return false;
     }
@@ -122,7 +110,7 @@ CommonConfig* MapCommonConfig(const base::Installation& installation) try {
 }
 
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec) {
-    const Lock lock(config.mutex);
+    const Lock lock = TryLock(config.mutex);
     return lock && MonotonicSeconds() - config.timestamp_sec <= max_age_sec;
 }
 

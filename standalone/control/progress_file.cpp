@@ -39,9 +39,9 @@ struct ProgressFile::Record {
     std::array<char, 64> session;
 };
 
-// Nothing when there is no such file, or it is another session's or swept.
-std::optional<ProgressFile> ProgressFile::Find(const std::filesystem::path& path, std::string_view session) {
-    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(path, O_NOFOLLOW);
+std::optional<ProgressFile> ProgressFile::Open(const std::filesystem::path& folder, std::int64_t key,
+                                               std::string_view session) {
+    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key), O_NOFOLLOW);
     if (!record) {
         return std::nullopt;
     }
@@ -50,11 +50,6 @@ std::optional<ProgressFile> ProgressFile::Find(const std::filesystem::path& path
         return std::nullopt;
     }
     return ProgressFile(*std::move(record), owner);
-}
-
-std::optional<ProgressFile> ProgressFile::Open(const std::filesystem::path& folder, std::int64_t key,
-                                               std::string_view session) {
-    return Find(PathOf(folder, key), session);
 }
 
 // Makes the file under a name of its own, to be linked to the key's name once complete.
@@ -93,7 +88,7 @@ std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folde
         if (::link(fresh.c_str(), path.c_str()) != 0 && errno != EEXIST) {
             base::ThrowErrno("cannot make " + path.string());
         }
-        if (auto file = Find(path, session); file && file->TakeOver()) {
+        if (auto file = Open(folder, key, session); file && file->TakeOver()) {
             return file;
         }
         std::this_thread::sleep_for(kPause);

@@ -45,7 +45,6 @@ class ProgressFile {
     struct Record;
     ProgressFile(MappedTable<Record> record, pid_t owner) : record_(std::move(record)), owner_(owner) {}
 
-    static std::optional<ProgressFile> Find(const std::filesystem::path& path, std::string_view session);
     static void Prepare(const std::filesystem::path& path, std::string_view session);
     bool TakeOver();
 
