@@ -14,8 +14,8 @@ namespace lookhaven::test {
 // Empty at first, and removed with all that is in it by the destructor.
 class TemporaryFolder {
   public:
-    TemporaryFolder() {
-        std::string pattern = std::filesystem::temp_directory_path() / "lookhaven-XXXXXX";
+    explicit TemporaryFolder(const std::string& name = "lookhaven") {
+        std::string pattern = std::filesystem::temp_directory_path() / (name + "-XXXXXX");
         if (::mkdtemp(pattern.data()) == nullptr) {
             throw std::system_error(errno, std::generic_category(), "cannot make " + pattern);
         }

@@ -128,7 +128,7 @@ TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
         threads = recorder.Count("task");
     }
     // Viewers may be silent for a pause of ten seconds.
-    ASSERT_TRUE(Eventually([&] { return Segments() == 0; }, seconds(30)));
+    ASSERT_TRUE(Eventually(seconds(30), [&] { return Segments() == 0; }));
     EXPECT_GE(base::MonotonicMicros() - requested_us, 15'000'000);
     EXPECT_TRUE(Eventually([&] { return recorder.Count("task") == threads - 1; }));
 }
@@ -208,7 +208,7 @@ TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {
     const std::optional<int> status = second.Wait();
     ASSERT_TRUE(status && WIFEXITED(*status));
     EXPECT_NE(WEXITSTATUS(*status), 0);
-    EXPECT_EQ(LogLines("another recorder runs for " + home_.string()), 1u);
+    EXPECT_EQ(LogLines("another recorder runs for " + home_.Path().string()), 1u);
     viewer.Take(3);
 }
 

@@ -13,10 +13,7 @@
 namespace lookhaven::ring {
 namespace {
 
-const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
-const StreamFormat kH264{"H264", {1, 2, 3}, 1280, 720, false};
 const StreamId kId{3, 0, Medium::kVideo};
-const Geometry kSmall{.index_slots = 64, .arena_bytes = 1 << 16};
 
 class LifecycleTest : public RingTest {
   protected:
@@ -149,13 +146,12 @@ TEST_F(LifecycleTest, KilledReadersKeepNeitherSpaceNorSlots) {
         }
     };
     // Sixteen frames fill the arena; each has a reader of its own.
+    const auto data = MakeData(4'000, 42);
     std::vector<std::unique_ptr<KilledChild>> readers;
     for (int i = 0; i < 16; ++i) {
         readers.push_back(std::make_unique<KilledChild>([&] { pin_everything(1); }));
-        const auto data = MakeData(4'000, 42);
         writer.Write({.data = data});
     }
-    const auto data = MakeData(4'000, 42);
     EXPECT_FALSE(writer.Write({.data = data})) << "living readers hold the whole arena";
     readers.clear();
     Write(writer, 100);

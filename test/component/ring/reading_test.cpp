@@ -18,8 +18,6 @@
 namespace lookhaven::ring {
 namespace {
 
-const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
-const StreamFormat kH264{"H264", {1, 2, 3}, 1280, 720, false};
 const StreamId kVideo{7, 1, Medium::kVideo};
 const StreamId kAudio{7, 1, Medium::kAudio};
 
@@ -51,14 +49,9 @@ class ReadingTest : public RingTest {
     }
     static std::uint64_t CountOf(const Entry* entry) { return entry == nullptr ? 0 : entry->Count(); }
     // Reads and releases at once.
-    std::uint64_t Next(int last) {
-        const Entry* entry = ReadNext(ring_, last, &position_);
-        const std::uint64_t count = CountOf(entry);
-        ReadFinish(ring_, entry, &position_);
-        return count;
-    }
-    std::uint64_t Latest(int last) {
-        const Entry* entry = ReadLatest(ring_, last, &position_, 0);
+    std::uint64_t Next(int last) { return Released(ReadNext(ring_, last, &position_)); }
+    std::uint64_t Latest(int last) { return Released(ReadLatest(ring_, last, &position_, 0)); }
+    std::uint64_t Released(const Entry* entry) {
         const std::uint64_t count = CountOf(entry);
         ReadFinish(ring_, entry, &position_);
         return count;
@@ -71,7 +64,7 @@ class ReadingTest : public RingTest {
 };
 
 TEST_F(ReadingTest, NumbersRunToTenThousandAndBeginAgainWithoutAGapForTheReader) {
-    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kMjpeg, kSmall);
     int last = kNoSequence;
     for (int i = 0; i < 20'005; ++i) {
         ASSERT_TRUE(Write());
@@ -140,7 +133,7 @@ TEST_F(ReadingTest, ASlowReaderGetsTheNewestFrameAndSkips) {
 }
 
 TEST_F(ReadingTest, OnlyWhatReadersHoldCanLeaveNoSpaceAndOnlyForAsLong) {
-    Open(kVideo, kH264, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kH264, kSmall);
     std::vector<Position> positions(4);
     for (Position& position : positions) {
         ASSERT_TRUE(Write(14'000));
@@ -156,7 +149,7 @@ TEST_F(ReadingTest, OnlyWhatReadersHoldCanLeaveNoSpaceAndOnlyForAsLong) {
 }
 
 TEST_F(ReadingTest, EntriesWithoutAPositionAreHeldUntilTheyAreReleasedAndTakeNoSlotAfterwards) {
-    Open(kVideo, kH264, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kH264, kSmall);
     EXPECT_EQ(ReadLatest(ring_), nullptr);
     EXPECT_EQ(ReadLatestIFrame(ring_), nullptr);
     WriteGroup("KppKp");
@@ -185,7 +178,7 @@ TEST_F(ReadingTest, EntriesWithoutAPositionAreHeldUntilTheyAreReleasedAndTakeNoS
 }
 
 TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
-    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kMjpeg, kSmall);
     ASSERT_TRUE(Write());
     struct Row {
         const char* name;
@@ -212,7 +205,7 @@ TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
 }
 
 TEST_F(ReadingTest, AFrameAndASignalEndAWait) {
-    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kMjpeg, kSmall);
     ASSERT_TRUE(Write());
     static std::atomic<int> signals{0};
     struct sigaction interrupt {};
@@ -254,7 +247,7 @@ TEST_F(ReadingTest, AFrameAndASignalEndAWait) {
 }
 
 TEST_F(ReadingTest, AForkedChildReadsNothingThroughItsParentsPositionAndLeavesItsPinAlone) {
-    Open(kVideo, kMjpeg, {.index_slots = 64, .arena_bytes = 1 << 16});
+    Open(kVideo, kMjpeg, kSmall);
     ASSERT_TRUE(Write(9'000));
     const Entry* held = ReadLatest(ring_, kNoSequence, &position_, 0);
     ASSERT_NE(held, nullptr);
@@ -272,7 +265,7 @@ TEST_F(ReadingTest, AForkedChildReadsNothingThroughItsParentsPositionAndLeavesIt
 }
 
 TEST_F(ReadingTest, FramesAndFormatsAreTakenWithinTheirBounds) {
-    Open(kVideo, {std::string(40, 'c'), std::vector<unsigned char>(1025), 1, 2, true}, {64, 1 << 16});
+    Open(kVideo, {std::string(40, 'c'), std::vector<unsigned char>(1025), 1, 2, true}, kSmall);
     EXPECT_EQ(std::string(Codec(ring_)), std::string(31, 'c'));
     EXPECT_TRUE(ExtraData(ring_).empty());
     struct Row {

@@ -50,11 +50,8 @@ TEST_F(TortureTest, ThreadsNeverSeeATornFrame) {
     }
     TortureWriter source(writer, seed, findings);
     const std::int64_t begin = base::MonotonicMicros();
-    const auto runs_longer = [&] {
-        const std::int64_t run = base::MonotonicMicros() - begin;
-        return run < kMinRunMicros || (findings.verified < kMinVerified && run < kMaxRunMicros);
-    };
-    while (runs_longer()) {
+    for (std::int64_t run = 0; run < kMinRunMicros || (findings.verified < kMinVerified && run < kMaxRunMicros);
+         run = base::MonotonicMicros() - begin) {
         source.WriteOnce(6'000);
         if (findings.written % 16 == 0) {
             std::this_thread::yield();
