@@ -65,7 +65,7 @@ void Admit(const Call& call, std::size_t max_requests) {
     call.context.SetCaller(call.login->user_id);
     call.context.SetSession(call.login->session_handle);
     control::SlotTable::SetSession(call.slot, call.login->session_handle);
-    if (call.slots.OlderOfSession(call.slot) >= max_requests) {
+    if (call.slots.OlderRequests(call.slot) >= max_requests) {
         throw Failure(503, "too many requests of this session are running");
     }
 }

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/download.h"
 
+#include <algorithm>
+#include <cctype>
 #include <cstdio>
 #include <filesystem>
 #include <string>
@@ -10,6 +12,7 @@
 #include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
+#include "standalone/base/text.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/store/cameras.h"
@@ -50,20 +53,11 @@ std::string TitleOf(store::Store& records, const Footage& footage) {
 
 // The plain form for every client, and the encoded one, which keeps the camera's name as it is.
 std::string Disposition(const std::string& title) {
-    std::string plain;
-    std::string encoded;
-    for (const char character : title + ".mkv") {
-        const auto byte = static_cast<unsigned char>(character);
-        const bool is_safe = std::isalnum(byte) != 0 || character == '.' || character == '-';
-        plain += is_safe || character == ' ' ? character : '_';
-        if (is_safe) {
-            encoded += character;
-        } else {
-            encoded += '%';
-            encoded += "0123456789ABCDEF"[byte >> 4];
-            encoded += "0123456789ABCDEF"[byte & 15];
-        }
-    }
+    std::string plain = title + ".mkv";
+    const std::string encoded = base::PercentEncode(plain, ".-");
+    std::replace_if(
+        plain.begin(), plain.end(),
+        [](unsigned char c) { return std::isalnum(c) == 0 && c != '.' && c != '-' && c != ' '; }, '_');
     return "attachment; filename=\"" + plain + "\"; filename*=UTF-8''" + encoded;
 }
 

@@ -2,10 +2,11 @@
 #include "standalone/api/parameters.h"
 
 #include <algorithm>
-#include <charconv>
 #include <memory>
+#include <optional>
 #include <string_view>
 
+#include "standalone/base/text.h"
 #include "standalone/binding/request.h"
 
 namespace lookhaven::api {
@@ -27,49 +28,25 @@ std::string_view Trim(std::string_view text) {
     return text.substr(begin, text.find_last_not_of(" \t") + 1 - begin);
 }
 
-// Well-formed UTF-8 without NUL: shortest forms only, no surrogates, nothing above U+10FFFF.
+// UTF-8 without NUL.
 bool IsText(std::string_view bytes) {
     while (!bytes.empty()) {
-        const auto at = [&](std::size_t i) { return i < bytes.size() ? static_cast<unsigned char>(bytes[i]) : 0U; };
-        const unsigned int first = at(0);
-        const std::size_t length = first < 0x80 ? 1 : first < 0xe0 ? 2 : first < 0xf0 ? 3 : 4;
-        const bool bad_first = first == 0 || (first >= 0x80 && first < 0xc2) || first > 0xf4;
-        const bool bad_second = (first == 0xe0 && at(1) < 0xa0) || (first == 0xed && at(1) > 0x9f) ||
-                                (first == 0xf0 && at(1) < 0x90) || (first == 0xf4 && at(1) > 0x8f);
-        if (bad_first || bad_second) {
+        if (base::TakeCharacter(bytes).value_or(0) == 0) {
             return false;
         }
-        for (std::size_t i = 1; i < length; ++i) {
-            if ((at(i) & 0xc0) != 0x80) {
-                return false;
-            }
-        }
-        bytes.remove_prefix(length);
     }
     return true;
 }
 
 std::string Unescape(std::string_view text) {
-    std::string plain;
-    plain.reserve(text.size());
-    for (std::size_t i = 0; i < text.size(); ++i) {
-        if (text[i] != '%') {
-            plain += text[i] == '+' ? ' ' : text[i];
-            continue;
-        }
-        unsigned int byte = 0;
-        const std::string_view digits = text.substr(i + 1, 2);
-        const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), byte, 16);
-        if (error != std::errc() || digits.size() != 2 || end != digits.data() + 2) {
-            throw http::Failure(400, "a parameter holds a broken escape");
-        }
-        plain += static_cast<char>(byte);
-        i += 2;
+    const std::optional<std::string> plain = base::DecodeForm(text, base::BrokenEscape::kRefuse);
+    if (!plain) {
+        throw http::Failure(400, "a parameter holds a broken escape");
     }
-    if (!IsText(plain)) {
+    if (!IsText(*plain)) {
         throw http::Failure(400, "a parameter is not UTF-8 text");
     }
-    return plain;
+    return *plain;
 }
 
 bool NamesMethod(const std::string& name) {

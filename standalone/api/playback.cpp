@@ -49,7 +49,7 @@ std::string SetRate(const Call& call) {
     if (!player.takes_rate) {
         throw Failure(409, "this player does not take its rate from here");
     }
-    const bool waits = player.pause_wanted && rate > 1;
+    const bool waits = player.pause_requested && rate > 1;
     player.resumed_rate = waits ? rate : 0;
     if (!ProgressOf(call, player).Set(waits ? 1 : rate)) {
         throw Failure(409, "the player has been replaced");
@@ -101,7 +101,7 @@ std::string Pause(const Call& call) {
             progress.Set(1);
         }
     }
-    player.pause_wanted = on;
+    player.pause_requested = on;
     AwaitPause(call, slot, on);
     if (const int rate = on ? 0 : player.resumed_rate.exchange(0); rate != 0) {
         ProgressOf(call, player).Set(rate);
@@ -115,10 +115,10 @@ std::string Pause(const Call& call) {
 std::string CheckOwner(const Call& call) {
     const control::Slot& slot = PlayerSlot(call);
     const std::string& session = call.context.Session();
-    const std::vector<control::Slot*> surplus = call.slots.SurplusPlayers(session, control::ReadPlayerFile(session));
+    const std::vector<control::Slot*> excess = call.slots.ExcessPlayers(session, control::ReadPlayerFile(session));
     call.slots.Wake();
     Json::Value data;
-    data["owner"] = std::find(surplus.begin(), surplus.end(), &slot) == surplus.end();
+    data["owner"] = std::find(excess.begin(), excess.end(), &slot) == excess.end();
     return SuccessAnswer(data);
 }
 

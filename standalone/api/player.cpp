@@ -43,7 +43,7 @@ void PreparePlayer(const Call& call) {
     player.takes_rate = shares_rate && is_paced;
     player.tells_position = !shares_rate;
     player.can_pause = by_times && is_paced && (shares_rate || IntOr(call, "playrate", 1) <= 1);
-    player.side_by_side = PlayersPerSession(call.Records());
+    player.max_players = PlayersPerSession(call.Records());
 }
 
 }  // namespace lookhaven::api

@@ -143,7 +143,7 @@ std::string ServeOrFail(const Service& service, const http::Request& request, co
 
 void ServeRequest(const Service& service, const http::Request& request, control::SlotTable& slots,
                   control::Slot& slot) {
-    binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.has_ended || slot.player.is_surplus; });
+    binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.must_end || slot.player.is_excess; });
     LimitAddressSpace(true);
     slot.pid = ::getpid();
     binding::RequestEvents events;

@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <array>
 #include <bit>
-#include <cerrno>
 #include <cstddef>
 #include <cstring>
 
@@ -14,6 +13,7 @@
 
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {
@@ -94,31 +94,18 @@ std::string Text(const std::array<char, 8>& name) {
 }
 
 void WriteAll(int file, const void* data, std::size_t size, std::uint64_t at, const std::string& path) {
-    const auto* bytes = static_cast<const char*>(data);
-    for (std::size_t done = 0; done < size;) {
-        const ssize_t written = ::pwrite(file, bytes + done, size - done, static_cast<off_t>(at + done));
-        if (written < 0 && errno != EINTR) {
-            base::ThrowErrno("cannot write " + path);
-        }
-        done += static_cast<std::size_t>(std::max<ssize_t>(written, 0));
+    if (!base::WriteAllAt(file, data, size, at)) {
+        base::ThrowErrno("cannot write " + path);
     }
 }
 
 // Returns how many bytes were read: fewer than size at the end of the file.
 std::size_t ReadUpTo(int file, void* buffer, std::size_t size, std::uint64_t at, const std::string& path) {
-    std::size_t done = 0;
-    while (done < size) {
-        const ssize_t got =
-            ::pread(file, static_cast<char*>(buffer) + done, size - done, static_cast<off_t>(at + done));
-        if (got == 0) {
-            break;
-        }
-        if (got < 0 && errno != EINTR) {
-            base::ThrowErrno("cannot read " + path);
-        }
-        done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+    const std::optional<std::size_t> got = base::ReadAllAt(file, buffer, size, at);
+    if (!got) {
+        base::ThrowErrno("cannot read " + path);
     }
-    return done;
+    return *got;
 }
 
 struct flock WholeFile(short type) {

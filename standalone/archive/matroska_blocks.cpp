@@ -3,12 +3,12 @@
 
 #include <algorithm>
 #include <bit>
-#include <cerrno>
 
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {
@@ -114,15 +114,12 @@ std::span<const std::uint8_t> MatroskaBlocks::Bytes(std::uint64_t at, std::size_
     constexpr std::size_t kWindowBytes = 4096;
     if (at < window_at_ || at + count > window_at_ + window_.size()) {
         window_.resize(std::max(kWindowBytes, count));
-        ssize_t got = -1;
-        do {
-            got = ::pread(file_, window_.data(), window_.size(), static_cast<off_t>(at));
-        } while (got < 0 && errno == EINTR);
-        if (got < 0) {
+        const std::optional<std::size_t> got = base::ReadAllAt(file_, window_.data(), window_.size(), at);
+        if (!got) {
             window_.clear();
             base::ThrowErrno("cannot read a recording");
         }
-        window_.resize(static_cast<std::size_t>(got));
+        window_.resize(*got);
         window_at_ = at;
     }
     const std::span<const std::uint8_t> rest = std::span(window_).subspan(at - window_at_);

@@ -2,15 +2,15 @@
 #include "standalone/archive/recording_log.h"
 
 #include <algorithm>
-#include <array>
-#include <cerrno>
 #include <stdexcept>
+#include <vector>
 
 #include <fcntl.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 
 namespace lookhaven::archive {
 
@@ -41,15 +41,9 @@ void WriteRecordingLog(const std::filesystem::path& camera_folder, std::int64_t 
     const auto write = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t, std::size_t count) {
         std::filesystem::create_directory(path.parent_path());
         const base::FileDescriptor log = base::OpenFile(path, O_WRONLY | O_CREAT);
-        std::array<std::uint8_t, 4096> bytes{};
-        bytes.fill(reason);
-        for (std::size_t done = 0; done < count;) {
-            const ssize_t written = ::pwrite(log.Get(), bytes.data(), std::min(bytes.size(), count - done),
-                                             offset + static_cast<off_t>(done));
-            if (written < 0 && errno != EINTR) {
-                base::ThrowErrno("cannot write " + path.string());
-            }
-            done += static_cast<std::size_t>(std::max<ssize_t>(written, 0));
+        const std::vector<std::uint8_t> bytes(count, reason);
+        if (!base::WriteAllAt(log.Get(), bytes.data(), bytes.size(), static_cast<std::uint64_t>(offset))) {
+            base::ThrowErrno("cannot write " + path.string());
         }
         // Readers take missing bytes at the end for zeros; the full size is for people who look at the file.
         if (::lseek(log.Get(), 0, SEEK_END) < kDaySeconds && ::ftruncate(log.Get(), kDaySeconds) != 0) {
@@ -69,13 +63,8 @@ bool ReadRecordingLog(const std::filesystem::path& camera_folder, std::int64_t b
     const auto read = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t first,
                           std::size_t count) {
         const base::FileDescriptor log(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
-        for (std::size_t done = 0; log && done < count;) {
-            const ssize_t got =
-                ::pread(log.Get(), &seconds[first + done], count - done, offset + static_cast<off_t>(done));
-            if (got == 0 || (got < 0 && errno != EINTR)) {
-                return;
-            }
-            done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+        if (log) {
+            base::ReadAllAt(log.Get(), &seconds[first], count, static_cast<std::uint64_t>(offset));
         }
     };
     ForEachDay(camera_folder, begin_s, begin_s + static_cast<std::int64_t>(seconds.size()), read);

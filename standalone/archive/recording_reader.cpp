@@ -2,7 +2,6 @@
 #include "standalone/archive/recording_reader.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <climits>
 #include <cmath>
 #include <system_error>
@@ -15,6 +14,7 @@
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {
@@ -62,16 +62,12 @@ class RecordingReader::Segment {
     }
 
     void ReadBytes(const FrameEntry& frame, std::span<std::uint8_t> buffer) const {
-        for (std::size_t done = 0; done < buffer.size();) {
-            const ssize_t got = ::pread(file_.Get(), buffer.data() + done, buffer.size() - done,
-                                        static_cast<off_t>(frame.offset + done));
-            if (got == 0) {
-                throw ArchiveError(path_.string() + " has become shorter");
-            }
-            if (got < 0 && errno != EINTR) {
-                base::ThrowErrno("cannot read " + path_.string());
-            }
-            done += static_cast<std::size_t>(std::max<ssize_t>(got, 0));
+        const std::optional<std::size_t> got = base::ReadAllAt(file_.Get(), buffer.data(), buffer.size(), frame.offset);
+        if (!got) {
+            base::ThrowErrno("cannot read " + path_.string());
+        }
+        if (*got < buffer.size()) {
+            throw ArchiveError(path_.string() + " has become shorter");
         }
     }
 

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Blocks all signals while threads are started.
+// Blocks all signals of the calling thread while other threads are started.
 //
-// Why so        A new thread inherits the mask of its parent. Threads that are started under this block stay without
-//               signals, so that the main thread is the one interrupted.
+// Why so        A new thread inherits its creator's signal mask. Threads that are started meanwhile keep signals
+//               blocked, so that the main thread is the one that is interrupted.
 #pragma once
 
 #include <csignal>

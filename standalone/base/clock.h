@@ -8,7 +8,7 @@
 
 namespace lookhaven::base {
 
-// Microseconds of CLOCK_MONOTONIC, the same in every process of the machine.
+// Microseconds of CLOCK_MONOTONIC: comparable between processes of the machine, not across a reboot.
 std::int64_t MonotonicMicros();
 
 // Milliseconds since the epoch (UTC).

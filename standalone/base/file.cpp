@@ -3,13 +3,17 @@
 
 #include <array>
 #include <cerrno>
+#include <optional>
 #include <system_error>
 #include <utility>
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include "standalone/base/io.h"
 
 namespace lookhaven::base {
 
@@ -25,19 +29,29 @@ FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsigned i
     return file;
 }
 
+FileDescriptor LockFile(const std::filesystem::path& path) {
+    FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT);
+    while (::flock(file.Get(), LOCK_EX) != 0) {
+        if (errno != EINTR) {
+            ThrowErrno("cannot lock " + path.string());
+        }
+    }
+    return file;
+}
+
 std::string ReadFile(const std::filesystem::path& path) {
     const FileDescriptor file = OpenFile(path, O_RDONLY);
     std::string contents;
     std::array<char, 16384> block{};
     for (;;) {
-        const ssize_t got = ::read(file.Get(), block.data(), block.size());
-        if (got == 0) {
-            return contents;
-        }
-        if (got < 0 && errno != EINTR) {
+        const std::optional<std::size_t> got = ReadAll(file.Get(), block.data(), block.size());
+        if (!got) {
             ThrowErrno("cannot read " + path.string());
         }
-        contents.append(block.data(), static_cast<std::size_t>(got < 0 ? 0 : got));
+        contents.append(block.data(), *got);
+        if (*got < block.size()) {
+            return contents;
+        }
     }
 }
 
@@ -45,14 +59,7 @@ namespace {
 
 void WriteWholeFile(const std::filesystem::path& path, std::string_view contents, unsigned int mode) {
     const FileDescriptor file = OpenFile(path, O_WRONLY | O_CREAT | O_TRUNC, mode);
-    for (std::string_view rest = contents; !rest.empty();) {
-        const ssize_t written = ::write(file.Get(), rest.data(), rest.size());
-        if (written < 0 && errno != EINTR) {
-            ThrowErrno("cannot write " + path.string());
-        }
-        rest.remove_prefix(static_cast<std::size_t>(written < 0 ? 0 : written));
-    }
-    if (::fsync(file.Get()) != 0) {
+    if (!WriteAll(file.Get(), contents.data(), contents.size()) || ::fsync(file.Get()) != 0) {
         ThrowErrno("cannot write " + path.string());
     }
 }
@@ -88,8 +95,9 @@ SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size
     *this = SharedMapping(file, size_bytes);
 }
 
-SharedMapping::SharedMapping(const FileDescriptor& file, std::size_t size_bytes) : size_bytes_(size_bytes) {
-    data_ = ::mmap(nullptr, size_bytes, PROT_READ | PROT_WRITE, MAP_SHARED, file.Get(), 0);
+SharedMapping::SharedMapping(const FileDescriptor& file, std::size_t size_bytes, bool read_only)
+    : size_bytes_(size_bytes) {
+    data_ = ::mmap(nullptr, size_bytes, read_only ? PROT_READ : PROT_READ | PROT_WRITE, MAP_SHARED, file.Get(), 0);
     if (data_ == MAP_FAILED) {
         data_ = nullptr;
         ThrowErrno("cannot map a file");
@@ -104,6 +112,10 @@ SharedMapping& SharedMapping::operator=(SharedMapping&& other) noexcept {
     std::swap(data_, other.data_);
     std::swap(size_bytes_, other.size_bytes_);
     return *this;
+}
+
+void* SharedMapping::Release() {
+    return std::exchange(data_, nullptr);
 }
 
 SharedMapping::~SharedMapping() {

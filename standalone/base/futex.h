@@ -9,10 +9,10 @@
 
 namespace lookhaven::base {
 
-// Sleeps while the word is still seen, until it is woken or the time is over. False when a signal ended the sleep.
+// Sleeps while the word equals seen, until Wake or the timeout; may return early. False when a signal ended the sleep.
 bool SleepWhile(const std::atomic<std::uint32_t>& word, std::uint32_t seen, std::chrono::microseconds timeout);
 
-// Changes the word and wakes everybody who sleeps on it.
+// Increments the word and wakes all threads that sleep on it, in every process.
 void Wake(std::atomic<std::uint32_t>& word);
 
 }  // namespace lookhaven::base

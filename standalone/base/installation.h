@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Where one installation keeps its things: everything hangs from its state folder.
+// The paths of one installation, all of them below its state folder.
 //
 // Why so        Two installations may run side by side on one machine (tests, a trial beside the real one); they share
 //               nothing but the operating system, so names of shared memory derive from the state folder too.
@@ -20,7 +20,7 @@ class Installation {
     // The folder named by LOOKHAVEN_HOME, else "var" below the working folder.
     static Installation FromEnvironment();
 
-    // Makes the state folder and its subfolders, private to the caller, where they are missing.
+    // Creates the state folder and its subfolders where they are missing, with access for the caller's user only.
     static void CreateFolders(const std::filesystem::path& home);
 
     const std::filesystem::path& Home() const { return home_; }

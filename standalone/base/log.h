@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Log lines on standard error, one write each, so that lines of several processes never mix.
+// Log lines on standard error, one write each, so that lines of several processes do not interleave.
 #pragma once
 
 #include <string_view>
@@ -17,7 +17,7 @@ void SetLogThreshold(Severity threshold);
 
 // Writes "2026-03-01T08:15:30.123Z recorder[812] error: text". Line breaks inside text become spaces. Never throws.
 //
-// Thread safety: any thread; also fit for a forked child.
+// Thread safety: any thread, and a forked child too.
 void Log(Severity severity, std::string_view text) noexcept;
 
 inline void LogError(std::string_view text) noexcept {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells processes apart for as long as it matters: a process id alone is reused.
+// Identifies a process for good: a process id alone is reused.
 #pragma once
 
 #include <cstdint>
@@ -19,14 +19,14 @@ struct ProcessIdentity {
 
 constexpr std::uint64_t kUnknownStart = ~std::uint64_t{0};
 
-// The start time of the process, 0 when it does not exist (a zombie counts as gone), or kUnknownStart when the system
-// does not say, as when descriptors have run out.
+// The start time of the process, 0 when it does not exist (a zombie counts as gone), or kUnknownStart when it
+// cannot be read, as when descriptors have run out.
 std::uint64_t ProcessStartTicks(pid_t pid);
 
-// The calling process; read anew after a fork. Throws std::runtime_error when its start time cannot be had.
+// The calling process; a forked child must call it again. Throws std::runtime_error when the start time cannot be read.
 ProcessIdentity ThisProcess();
 
-// False once that very process is certainly gone: what it holds may be taken away then.
+// False once that very process is certainly gone, so that what it holds may be released. True when in doubt.
 bool IsAlive(const ProcessIdentity& process);
 
 // Lets the calling process open as many descriptors as the system ever grants it.

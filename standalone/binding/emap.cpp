@@ -3,11 +3,11 @@
 // E-maps with the items placed on them, as far as the caller may see the map.
 #include "platform/emap/emap.h"
 
+#include "standalone/base/text.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/emap_pictures.h"
 #include "standalone/store/emaps.h"
-#include "standalone/store/text.h"
 
 namespace store = lookhaven::store;
 using lookhaven::binding::OrFailure;
@@ -86,7 +86,7 @@ bool Emap::GetSmallItemSize() const {
 std::string LoadEmapImgBase64String(const std::string& imageName, int& length) {
     const std::string text = OrFailure("LoadEmapImgBase64String", std::string(), [&] {
         RequestContext& context = RequestContext::Current();
-        return store::ToBase64(store::EmapPictures(context.Records(), context.Home().Home()).Read(imageName));
+        return lookhaven::base::ToBase64(store::EmapPictures(context.Records(), context.Home().Home()).Read(imageName));
     });
     length = static_cast<int>(text.size());
     return text;

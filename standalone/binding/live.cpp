@@ -90,7 +90,7 @@ void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
             ring::Detach(stream);
             stream = nullptr;
         }
-        demand.Touch(*context.GrantedStream());
+        demand.Request(*context.GrantedStream());
         const timespec pause{0, kAttachPollNanos};
         if (MonotonicMicros() - start > kMaxAttachMicros || !IsLHRunning() || ::nanosleep(&pause, nullptr) != 0) {
             break;
@@ -193,15 +193,15 @@ void LiveStreamUpdater::StartLive() {
     UpdateStamp();
 }
 
-// Only for the stream that the caller has been granted: a stamp alone must not start a camera that the caller may not
-// see. Attaching stamps by itself.
+// Only for the stream that the caller has been granted: a request alone must not start a camera that the caller may not
+// see. Attaching requests the stream by itself.
 void LiveStreamUpdater::UpdateStamp() {
     OrFailure("LiveStreamUpdater", 0, [&] {
         const RequestContext& context = RequestContext::Current();
         const control::LiveStream stream{m_CamId, m_StreamNo};
         if (context.GrantedStream() == stream) {
             static control::Demand demand(context.Home());
-            demand.Touch(stream);
+            demand.Request(stream);
         }
         return 0;
     });

@@ -12,8 +12,8 @@
 
 #include "platform/output/multipartresponse.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/text.h"
 #include "standalone/binding/request_context.h"
-#include "standalone/store/text.h"
 
 namespace {
 
@@ -50,7 +50,7 @@ std::string Base64(const unsigned char* data, int length) {
     if (data == nullptr || length <= 0 || static_cast<std::size_t>(length) > lookhaven::ring::kMaxExtraBytes) {
         return "";
     }
-    return lookhaven::store::ToBase64({reinterpret_cast<const char*>(data), static_cast<std::size_t>(length)});
+    return lookhaven::base::ToBase64({reinterpret_cast<const char*>(data), static_cast<std::size_t>(length)});
 }
 
 }  // namespace

@@ -13,6 +13,7 @@
 #include <sys/socket.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/text.h"
 
 namespace lookhaven::binding {
 
@@ -26,12 +27,7 @@ std::string RandomBoundary() {
     if (::getrandom(bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
         base::ThrowErrno("cannot make a boundary");
     }
-    std::string boundary = "part-";
-    for (const unsigned int byte : bytes) {
-        boundary += "0123456789abcdef"[byte >> 4];
-        boundary += "0123456789abcdef"[byte & 15];
-    }
-    return boundary;
+    return "part-" + base::ToHex(bytes);
 }
 
 // Drops the bytes from the front; returns the pieces that are left.

@@ -7,11 +7,11 @@
 #include <optional>
 
 #include "standalone/base/file.h"
+#include "standalone/base/text.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/emap_items.h"
 #include "standalone/store/emap_json.h"
 #include "standalone/store/emap_pictures.h"
-#include "standalone/store/text.h"
 
 namespace lookhaven::cli {
 
@@ -139,7 +139,7 @@ void Export(const Console& console, const Request& request) {
     file["hideItemName"] = emap.hide_names;
     file["smallItemSize"] = emap.small_items;
     file["items"] = store::ToJson(Emaps(store).Items(emap.id));
-    file["picture"] = store::ToBase64(EmapPictures(store, console.Installation().Home()).Read(emap.image));
+    file["picture"] = base::ToBase64(EmapPictures(store, console.Installation().Home()).Read(emap.image));
     base::WriteFileAtomically(request.file, ToJson(file) + "\n", 0644);
     Json::Value data;
     data["id"] = emap.id;
@@ -170,7 +170,7 @@ Json::Value ReadEmapFile(const std::string& path) {
 
 void Import(const Console& console, const Request& request) {
     const Json::Value file = ReadEmapFile(request.file);
-    const std::optional<std::string> picture = store::FromBase64(file["picture"].asString());
+    const std::optional<std::string> picture = base::FromBase64(file["picture"].asString());
     if (!picture) {
         throw Failure(kDataError, "the picture in " + request.file + " is damaged");
     }

@@ -4,8 +4,8 @@
 #include <memory>
 #include <optional>
 
+#include "standalone/base/text.h"
 #include "standalone/cli/console.h"
-#include "standalone/store/text.h"
 
 namespace lookhaven::cli {
 
@@ -53,14 +53,14 @@ std::string ToText(const PairOffer& offer) {
         entry["video"] = static_cast<int>(camera.video_type);
         entry["audio"] = camera.audio;
     }
-    return std::string(kPrefix) + store::ToBase64(ToJson(json));
+    return std::string(kPrefix) + base::ToBase64(ToJson(json));
 }
 
 PairOffer ParsePairText(const std::string& text) {
     std::string_view rest = text;
     if (rest.starts_with(kPrefix)) {
         rest.remove_prefix(kPrefix.size());
-        if (const std::optional<std::string> json = store::FromBase64(rest)) {
+        if (const std::optional<std::string> json = base::FromBase64(rest)) {
             try {
                 return Read(ParseJson(*json));
             } catch (const Json::Exception&) {

@@ -1,22 +1,22 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recording service's common record, which every stream looks at: is the service alive, should streams pause?
+// The recorder's common record, which every stream looks at: is the recorder alive, should streams pause?
 //
 // Why so        Readers lock the record, and any of them may be killed while it holds the lock: the mutex is robust.
-// The
-//               record lies in a mapped file that is replaced after a reboot only, since a mutex that was held when the
-//               machine lost power would stay locked for ever.
+//               The record lies in a mapped file that is replaced only after a reboot, since a mutex that was held when
+//               the machine lost power would stay locked for ever.
 #pragma once
 
 #include <cstdint>
-#include <memory>
 
 #include <pthread.h>
 
-#include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
+
+struct CommonConfigFile;
 
 struct CommonConfig {
     pthread_mutex_t mutex;       // process-shared, robust, error-checking; guards the rest
@@ -27,22 +27,22 @@ struct CommonConfig {
 // The recorder's side.
 class CommonConfigKeeper {
   public:
-    // Makes the record when this boot of the machine has none. Throws std::system_error when that fails.
+    // Creates the record if this boot of the machine has none. Throws std::system_error when that fails.
     explicit CommonConfigKeeper(const base::Installation& installation);
 
-    // Stamps the record with the present time; call it every second. A lock that a dead process held is taken over.
-    // False when the lock was not to be had within a second.
+    // Says that the recorder is alive; call it every second. The lock of a dead process is taken over. False when the
+    // lock could not be taken within a second.
     bool Refresh(bool paused);
 
   private:
-    base::SharedMapping mapping_;
+    MappedTable<CommonConfigFile> table_;
 };
 
-// The record, mapped until the process ends; null while there is none of this boot and size. Keep the pointer: each
-// call maps anew.
+// The record, mapped until the process ends; null while there is none of this boot. Keep the pointer: each call maps it
+// again.
 CommonConfig* MapCommonConfig(const base::Installation& installation);
 
-// The record was refreshed at most max_age_sec ago.
+// The record was refreshed at most max_age_sec ago. May wait a second for the lock, and is false without it.
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec = 5);
 
 }  // namespace lookhaven::control

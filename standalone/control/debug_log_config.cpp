@@ -2,14 +2,9 @@
 #include "standalone/control/debug_log_config.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <iterator>
 #include <stdexcept>
-
-#include <fcntl.h>
-#include <sys/file.h>
-#include <sys/mman.h>
-#include <sys/stat.h>
+#include <system_error>
 
 #include "standalone/base/process.h"
 
@@ -24,40 +19,18 @@ std::filesystem::path ConfigPath(const base::Installation& installation) {
     return installation.Home() / "debug-log";
 }
 
-base::FileDescriptor LockFile(const std::filesystem::path& path) {
-    base::FileDescriptor file = base::OpenFile(path, O_RDWR | O_CREAT);
-    while (::flock(file.Get(), LOCK_EX) != 0) {
-        if (errno != EINTR) {
-            base::ThrowErrno("cannot lock " + path.string());
-        }
-    }
-    return file;
-}
-
 }  // namespace
 
-const DebugLogConfig* MapDebugLog(const base::Installation& installation) {
-    const base::FileDescriptor file(::open(ConfigPath(installation).c_str(), O_RDONLY | O_CLOEXEC));
-    struct stat status {};
-    if (!file || ::fstat(file.Get(), &status) != 0 || status.st_size < static_cast<off_t>(sizeof(DebugLogConfig))) {
-        return nullptr;
-    }
-    void* data = ::mmap(nullptr, sizeof(DebugLogConfig), PROT_READ, MAP_SHARED, file.Get(), 0);
-    if (data == MAP_FAILED) {
-        return nullptr;
-    }
-    const auto* config = static_cast<const DebugLogConfig*>(data);
-    if (config->version != kVersion) {
-        ::munmap(data, sizeof(DebugLogConfig));
-        return nullptr;
-    }
-    return config;
+const DebugLogConfig* MapDebugLog(const base::Installation& installation) try {
+    auto table = MappedTable<const DebugLogConfig>::Open(ConfigPath(installation));
+    return table && (*table)->version == kVersion ? table->Release() : nullptr;
+} catch (const std::system_error&) {
+    return nullptr;
 }
 
 DebugLogEditor::DebugLogEditor(const base::Installation& installation)
-    : lock_(LockFile(ConfigPath(installation))),
-      mapping_(ConfigPath(installation), sizeof(DebugLogConfig)),
-      config_(static_cast<DebugLogConfig*>(mapping_.Data())) {
+    : lock_(base::LockFile(ConfigPath(installation))),
+      config_(MappedTable<DebugLogConfig>::OpenOrCreate(ConfigPath(installation))) {
     if (config_->version != kVersion) {
         config_->process_count = 0;
         SetEveryCategory(kErrorsOnly);

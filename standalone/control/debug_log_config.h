@@ -2,19 +2,19 @@
 //
 // The debug-log configuration that all processes of an installation share: who logs how much.
 //
-// Why so        A running stream must start and stop to log in detail without being touched, so the thresholds stand in
-//               a mapped file (debug-log in the state folder) that each process looks at per line.
+// Why so        Detailed logging of a running stream must be switched on and off from outside, so the thresholds are in
+//               a mapped file (debug-log in the state folder) that each process looks at for each line.
 // Invariants    (1) The layout is fixed: the web API module reads it by its own declaration.
 //               (2) A reader never writes; one writer at a time (a lock on the file).
 #pragma once
 
 #include <cstdint>
-#include <filesystem>
 
 #include <sys/types.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
 
@@ -38,8 +38,8 @@ static_assert(sizeof(DebugLogConfig) == 2056 + 8 * kDebugLogProcessCount);
 // program understands.
 const DebugLogConfig* MapDebugLog(const base::Installation& installation);
 
-// Changes the configuration; made with threshold 1 (errors) for every category where it is missing. Holds the writers'
-// lock for its lifetime. Throws std::system_error when the file cannot be made or mapped.
+// Changes the configuration; a new one has threshold 1 (errors) for every category. Holds the writers' lock for its
+// lifetime, so a second one waits. Throws std::system_error when the file cannot be created or mapped.
 class DebugLogEditor {
   public:
     explicit DebugLogEditor(const base::Installation& installation);
@@ -57,8 +57,7 @@ class DebugLogEditor {
 
   private:
     base::FileDescriptor lock_;
-    base::SharedMapping mapping_;
-    DebugLogConfig* config_;
+    MappedTable<DebugLogConfig> config_;
 };
 
 }  // namespace lookhaven::control

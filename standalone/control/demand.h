@@ -1,20 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The live demand table: viewers stamp the streams that they watch, the recorder runs the stamped ones.
+// The live demand table: viewers request the streams that they watch, the recorder runs those requested lately.
 //
 // Why so        Cameras that nobody watches should cost nothing, and a viewer that is killed must not keep one running:
-// so
-//               a wish is a stamp that ages. The table is a mapped file, for neither side may wait for the other.
+//               so requests expire, and viewers repeat them. The table is a mapped file, since neither side may wait
+//               for the other.
 // Thread safety Any thread and process.
 #pragma once
 
-#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <vector>
 
-#include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
 
@@ -30,29 +29,29 @@ class Demand {
     static constexpr std::size_t kSlots = 1024;
     static constexpr std::chrono::seconds kMaxAge{20};  // viewers may be silent for a ten-second pause
 
-    // Maps the table, which is created when missing. Throws std::system_error when that fails.
+    // Maps the table, which is created when missing. Throws std::system_error when that fails, std::runtime_error when
+    // the table is another version's.
     explicit Demand(const base::Installation& installation);
 
-    // Says that somebody wants the stream now. Wakes WaitForDemand when nobody did lately. Never waits; a wish that
-    // finds the table full of younger ones is lost.
-    void Touch(LiveStream stream);
+    // A viewer's: asks for the stream until the request expires. Wakes WaitForDemand if nobody has asked for it lately.
+    // Never waits; the request is lost when the table is full of other streams' younger ones.
+    void Request(LiveStream stream);
 
-    // The streams stamped at most max_age before now (base::MonotonicMicros), sorted, each once.
+    // The streams requested at most max_age before now (base::MonotonicMicros), sorted, each once.
     std::vector<LiveStream> ActiveStreams(std::int64_t now_micros, std::chrono::microseconds max_age = kMaxAge) const;
 
-    // Ends the recorder's WaitForDemand: something else wants to be looked at.
+    // Ends the recorder's WaitForDemand for another reason.
     void Wake();
 
-    // Waits until a stream is wanted that was not before the last call, or Wake is called, or the time is over; a signal
-    // ends the wait too.
+    // Waits until a stream is newly requested after the last call returned, Wake is called, or the timeout; a signal
+    // ends the wait too. One thread per object.
     void WaitForDemand(std::chrono::milliseconds timeout);
 
   private:
     struct Table;
-    Table& Shared() const;
 
-    base::SharedMapping mapping_;
-    std::uint32_t seen_ = 0;
+    MappedTable<Table> table_;
+    std::uint32_t seen_;  // of the table's futex word
 };
 
 }  // namespace lookhaven::control

@@ -3,7 +3,7 @@
 
 #include <algorithm>
 #include <array>
-#include <stdexcept>
+#include <atomic>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/futex.h"
@@ -14,12 +14,12 @@ namespace {
 
 constexpr std::uint64_t kTableVersion = 0x4c48464c00000001ULL;
 
-enum State : std::uint32_t { kFree = 0, kAsked = 1, kFlushed = 2, kRefused = 3 };
+enum State : std::uint32_t { kFree = 0, kRequested = 1, kFlushed = 2, kRefused = 3 };
 
-// A slot in one word, so that it changes hands in one step: the event, when it was asked for, the state.
+// A slot in one word, so that it changes hands in one step: the event, when it was requested, the state.
 struct Request {
     std::int32_t event;
-    std::uint32_t asked_ms;  // of the monotonic clock, its low 30 bits
+    std::uint32_t requested_ms;  // of the monotonic clock, its low 30 bits
     State state;
 
     static Request Of(std::uint64_t word) {
@@ -27,9 +27,11 @@ struct Request {
                 static_cast<State>(word & 3)};
     }
     std::uint64_t Word() const {
-        return (std::uint64_t{static_cast<std::uint32_t>(event)} << 32) | (std::uint64_t{asked_ms} << 2) | state;
+        return (std::uint64_t{static_cast<std::uint32_t>(event)} << 32) | (std::uint64_t{requested_ms} << 2) | state;
     }
-    bool IsStale(std::uint32_t now_ms) const { return ((now_ms - asked_ms) & 0x3fffffff) > FlushRequests::kStaleMs; }
+    bool IsStale(std::uint32_t now_ms) const {
+        return ((now_ms - requested_ms) & 0x3fffffff) > FlushRequests::kStaleMs;
+    }
 };
 
 std::uint32_t NowMs() {
@@ -48,7 +50,7 @@ struct FlushRequests::Table {
         for (std::atomic<std::uint64_t>& slot : slots) {
             std::uint64_t held = slot.load();
             const Request before = Request::Of(held);
-            if ((before.state == kFree || before.IsStale(request.asked_ms)) &&
+            if ((before.state == kFree || before.IsStale(request.requested_ms)) &&
                 slot.compare_exchange_strong(held, request.Word())) {
                 return &slot;
             }
@@ -58,27 +60,16 @@ struct FlushRequests::Table {
 };
 
 FlushRequests::FlushRequests(const base::Installation& installation)
-    : mapping_(installation.RunFolder() / "flush-requests", sizeof(Table)),
+    : table_(MappedTable<Table>::OpenOrCreate(installation.RunFolder() / "flush-requests", kTableVersion)),
       recorder_(installation),
-      config_(MapCommonConfig(installation)) {
-    std::uint64_t version = 0;
-    if (!Shared().version.compare_exchange_strong(version, kTableVersion) && version != kTableVersion) {
-        throw std::runtime_error((installation.RunFolder() / "flush-requests").string() +
-                                 " was made by another version: stop everything and remove it");
-    }
-}
-
-FlushRequests::Table& FlushRequests::Shared() const {
-    return *static_cast<Table*>(mapping_.Data());
-}
+      config_(MapCommonConfig(installation)) {}
 
 bool FlushRequests::Ask(std::int32_t event, std::chrono::milliseconds limit) {
     if (config_ == nullptr || !IsRecorderAlive(*config_)) {
         return false;
     }
-    Table& table = Shared();
-    const Request request{event, NowMs(), kAsked};
-    std::atomic<std::uint64_t>* slot = table.Take(request);
+    const Request request{event, NowMs(), kRequested};
+    std::atomic<std::uint64_t>* slot = table_->Take(request);
     if (slot == nullptr) {
         return false;
     }
@@ -86,22 +77,22 @@ bool FlushRequests::Ask(std::int32_t event, std::chrono::milliseconds limit) {
     const std::int64_t end_us = base::MonotonicMicros() + std::chrono::microseconds(limit).count();
     std::uint64_t held = request.Word();
     for (std::int64_t left_us = 1; left_us > 0; left_us = end_us - base::MonotonicMicros()) {
-        const std::uint32_t answers = table.answers.load();
+        const std::uint32_t answers = table_->answers.load();
         held = slot->load();
-        if (held != request.Word() || !base::SleepWhile(table.answers, answers, std::chrono::microseconds(left_us))) {
+        if (held != request.Word() || !base::SleepWhile(table_->answers, answers, std::chrono::microseconds(left_us))) {
             break;
         }
     }
     held = slot->load();
-    const bool is_ours = Request::Of(held).event == event && Request::Of(held).asked_ms == request.asked_ms;
+    const bool is_ours = Request::Of(held).event == event && Request::Of(held).requested_ms == request.requested_ms;
     return is_ours && slot->compare_exchange_strong(held, 0) && Request::Of(held).state == kFlushed;
 }
 
 std::vector<std::int32_t> FlushRequests::Pending() const {
     std::vector<std::int32_t> events;
-    for (const std::atomic<std::uint64_t>& slot : Shared().slots) {
+    for (const std::atomic<std::uint64_t>& slot : table_->slots) {
         const Request request = Request::Of(slot.load());
-        if (request.state == kAsked && !request.IsStale(NowMs())) {
+        if (request.state == kRequested && !request.IsStale(NowMs())) {
             events.push_back(request.event);
         }
     }
@@ -111,16 +102,15 @@ std::vector<std::int32_t> FlushRequests::Pending() const {
 }
 
 void FlushRequests::Answer(std::int32_t event, bool flushed) {
-    Table& table = Shared();
-    for (std::atomic<std::uint64_t>& slot : table.slots) {
+    for (std::atomic<std::uint64_t>& slot : table_->slots) {
         std::uint64_t held = slot.load();
         Request request = Request::Of(held);
-        if (request.state == kAsked && request.event == event) {
+        if (request.state == kRequested && request.event == event) {
             request.state = flushed ? kFlushed : kRefused;
             slot.compare_exchange_strong(held, request.Word());
         }
     }
-    base::Wake(table.answers);
+    base::Wake(table_->answers);
 }
 
 }  // namespace lookhaven::control

@@ -10,7 +10,6 @@
 #include <thread>
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 namespace lookhaven::control {
@@ -40,37 +39,23 @@ struct ProgressFile::Record {
     std::array<char, 64> session;
 };
 
-std::optional<base::SharedMapping> ProgressFile::Map(const std::filesystem::path& path) {
-    const base::FileDescriptor file(::open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW));
-    struct stat status {};
-    if (!file || ::fstat(file.Get(), &status) != 0 || status.st_size != static_cast<off_t>(sizeof(Record))) {
-        return std::nullopt;
-    }
-    return base::SharedMapping(file, sizeof(Record));
-}
-
-ProgressFile::Record& ProgressFile::Shared() const {
-    return *static_cast<Record*>(mapping_.Data());
-}
-
 std::optional<ProgressFile> ProgressFile::Open(const std::filesystem::path& folder, std::int64_t key,
                                                std::string_view session) {
-    std::optional<base::SharedMapping> mapping = Map(PathOf(folder, key));
-    if (!mapping) {
+    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key), O_NOFOLLOW);
+    if (!record) {
         return std::nullopt;
     }
-    const auto& record = *static_cast<const Record*>(mapping->Data());
-    const pid_t owner = record.owner;
-    if (record.magic != kMagic || owner == kSwept || session != std::string_view(record.session.data())) {
+    const pid_t owner = (*record)->owner;
+    if ((*record)->magic != kMagic || owner == kSwept || session != std::string_view((*record)->session.data())) {
         return std::nullopt;
     }
-    return ProgressFile(*std::move(mapping), owner);
+    return ProgressFile(*std::move(record), owner);
 }
 
-// Under a name of its own, so that it is linked to the key's name complete.
+// Makes the file under a name of its own, to be linked to the key's name once complete.
 void ProgressFile::Prepare(const std::filesystem::path& path, std::string_view session) {
-    const base::SharedMapping mapping(path, sizeof(Record));
-    Record& record = *static_cast<Record*>(mapping.Data());
+    const auto table = MappedTable<Record>::OpenOrCreate(path);
+    Record& record = *table;
     if (session.size() >= record.session.size()) {
         throw std::invalid_argument("a session handle is too long");
     }
@@ -81,19 +66,13 @@ void ProgressFile::Prepare(const std::filesystem::path& path, std::string_view s
     session.copy(record.session.data(), session.size());
 }
 
-std::optional<ProgressFile> ProgressFile::TakeOver(const std::filesystem::path& path, std::string_view session) {
-    std::optional<base::SharedMapping> mapping = Map(path);
-    if (!mapping) {
-        return std::nullopt;
+bool ProgressFile::TakeOver() {
+    if (!record_->owner.compare_exchange_strong(owner_, ::getpid())) {
+        return false;
     }
-    Record& record = *static_cast<Record*>(mapping->Data());
-    pid_t owner = record.owner;
-    if (record.magic != kMagic || owner == kSwept || session != std::string_view(record.session.data()) ||
-        !record.owner.compare_exchange_strong(owner, ::getpid())) {
-        return std::nullopt;
-    }
-    record.value = kUnset;
-    return ProgressFile(*std::move(mapping), ::getpid());
+    owner_ = ::getpid();
+    record_->value = kUnset;
+    return true;
 }
 
 std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folder, std::int64_t key,
@@ -104,12 +83,12 @@ std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folde
     fresh += "." + std::to_string(::getpid()) + ".new";
     const Unlinked remove_at_end{fresh};
     Prepare(fresh, session);
-    // What keeps the key from being taken over may be its sweeping, which is over in a moment.
+    // The key may just be swept, which is over in a moment.
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
         if (::link(fresh.c_str(), path.c_str()) != 0 && errno != EEXIST) {
             base::ThrowErrno("cannot make " + path.string());
         }
-        if (auto file = TakeOver(path, session)) {
+        if (auto file = Open(folder, key, session); file && file->TakeOver()) {
             return file;
         }
         std::this_thread::sleep_for(kPause);
@@ -119,8 +98,8 @@ std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folde
 
 void ProgressFile::Sweep(const std::filesystem::path& folder, std::int64_t key, pid_t owner) {
     const std::filesystem::path path = PathOf(folder, key);
-    const std::optional<base::SharedMapping> mapping = Map(path);
-    if (mapping && static_cast<Record*>(mapping->Data())->owner.compare_exchange_strong(owner, kSwept)) {
+    const auto record = MappedTable<Record>::Open(path, O_NOFOLLOW);
+    if (record && (*record)->owner.compare_exchange_strong(owner, kSwept)) {
         ::unlink(path.c_str());
     }
 }
@@ -129,16 +108,16 @@ bool ProgressFile::Set(int value) {
     if (!IsCurrent()) {
         return false;
     }
-    Shared().value = value;
+    record_->value = value;
     return true;
 }
 
 bool ProgressFile::IsCurrent() const {
-    return Shared().owner == owner_;
+    return record_->owner == owner_;
 }
 
 int ProgressFile::Get() const {
-    return IsCurrent() ? Shared().value.load() : kUnset;
+    return IsCurrent() ? record_->value.load() : kUnset;
 }
 
 }  // namespace lookhaven::control

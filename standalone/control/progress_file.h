@@ -2,8 +2,8 @@
 //
 // One number that a player shares with its client's other requests: a small mapped file for each stream key.
 //
-// Why so        Both sides may be killed at any point, and the host sweeps what they leave while a new player takes the same
-//               key. So nobody locks: whoever owns the file is a process id in it, which changes hands by compare and swap.
+// Why so        Both sides may be killed at any point, and the host sweeps what they leave while a new player takes the
+//               same key. So nobody locks: the file holds its owner's process id, which changes by compare and swap.
 // Invariants    (1) A file appears under its name complete. (2) The session in it never changes.
 //               (3) Once its owner is kSwept the file is removed, and nobody takes it over any more.
 // Thread safety Any process; one thread per object.
@@ -16,7 +16,7 @@
 
 #include <sys/types.h>
 
-#include "standalone/base/file.h"
+#include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
 
@@ -24,8 +24,9 @@ class ProgressFile {
   public:
     static constexpr int kUnset = -1;
 
-    // Makes the calling process the owner of the key, with no number set; folder is made when it is missing. Nothing when
-    // the key is another session's. Throws std::system_error; std::invalid_argument for a session that is too long.
+    // Makes the calling process the owner of the key, with no number set; creates the folder if it is missing. Nothing
+    // when the key is another session's. Throws std::system_error; std::invalid_argument for a session that is too
+    // long.
     static std::optional<ProgressFile> Own(const std::filesystem::path& folder, std::int64_t key,
                                            std::string_view session);
     // Nothing when there is no such key, or it is another session's.
@@ -34,22 +35,20 @@ class ProgressFile {
     // Removes the key's file when the process owns it.
     static void Sweep(const std::filesystem::path& folder, std::int64_t key, pid_t owner);
 
-    // Both are false, once and for all, when the file has changed hands since this object was made.
+    // Both are false for good once the file has another owner than when this object was made.
     bool Set(int value);
     bool IsCurrent() const;
-    // kUnset too when the file has changed hands.
+    // kUnset also then.
     int Get() const;
 
   private:
     struct Record;
-    ProgressFile(base::SharedMapping mapping, pid_t owner) : mapping_(std::move(mapping)), owner_(owner) {}
+    ProgressFile(MappedTable<Record> record, pid_t owner) : record_(std::move(record)), owner_(owner) {}
 
-    static std::optional<base::SharedMapping> Map(const std::filesystem::path& path);
     static void Prepare(const std::filesystem::path& path, std::string_view session);
-    static std::optional<ProgressFile> TakeOver(const std::filesystem::path& path, std::string_view session);
-    Record& Shared() const;
+    bool TakeOver();
 
-    base::SharedMapping mapping_;
+    MappedTable<Record> record_;
     pid_t owner_;
 };
 

@@ -16,7 +16,7 @@ namespace lookhaven::control {
 namespace {
 
 bool IsPlayerOf(const Slot& slot, std::string_view session) {
-    return slot.serial != 0 && slot.player.since_us != 0 && SessionOf(slot) == session;
+    return slot.serial != 0 && slot.player.started_us != 0 && SessionOf(slot) == session;
 }
 
 }  // namespace
@@ -43,11 +43,11 @@ Slot* SlotTable::Take() {
     }
     slot->is_stream = false;
     slot->has_session = false;
-    slot->has_ended = false;
+    slot->must_end = false;
     slot->pid = 0;
-    slot->player.since_us = 0;
-    slot->player.is_surplus = false;
-    slot->player.pause_wanted = false;
+    slot->player.started_us = 0;
+    slot->player.is_excess = false;
+    slot->player.pause_requested = false;
     slot->player.paused = false;
     slot->player.resumed_rate = 0;
     slot->serial = ++last_serial_;
@@ -63,7 +63,7 @@ void SlotTable::SetSession(Slot& slot, std::string_view handle) {
     slot.has_session = true;
 }
 
-std::size_t SlotTable::OlderOfSession(const Slot& slot) const {
+std::size_t SlotTable::OlderRequests(const Slot& slot) const {
     return static_cast<std::size_t>(std::count_if(slots_.begin(), slots_.end(), [&](const Slot& each) {
         const std::uint64_t serial = each.serial;
         return serial != 0 && serial < slot.serial && SessionOf(each) == SessionOf(slot);
@@ -73,7 +73,7 @@ std::size_t SlotTable::OlderOfSession(const Slot& slot) const {
 std::set<std::string> SlotTable::Sessions() const {
     std::set<std::string> sessions;
     for (const Slot& slot : slots_) {
-        if (slot.serial != 0 && slot.has_session && !slot.has_ended) {
+        if (slot.serial != 0 && slot.has_session && !slot.must_end) {
             sessions.emplace(SessionOf(slot));
         }
     }
@@ -83,20 +83,20 @@ std::set<std::string> SlotTable::Sessions() const {
 void SlotTable::EndSession(std::string_view handle) {
     for (Slot& slot : slots_) {
         if (slot.serial != 0 && SessionOf(slot) == handle) {
-            slot.has_ended = true;
+            slot.must_end = true;
         }
     }
     Wake();
 }
 
 void SlotTable::End(Slot& slot) {
-    slot.has_ended = true;
+    slot.must_end = true;
     Wake();
 }
 
 void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
     slot.player.key = key;
-    slot.player.since_us = base::MonotonicMicros();
+    slot.player.started_us = base::MonotonicMicros();
     Wake();
 }
 
@@ -104,7 +104,7 @@ Slot* SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
     Slot* found = nullptr;
     for (Slot& slot : slots_) {
         if (IsPlayerOf(slot, session) && slot.player.key == key &&
-            (found == nullptr || slot.player.since_us > found->player.since_us)) {
+            (found == nullptr || slot.player.started_us > found->player.started_us)) {
             found = &slot;
         }
     }
@@ -114,29 +114,29 @@ Slot* SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
 std::set<std::string> SlotTable::SessionsWithPlayers() const {
     std::set<std::string> sessions;
     for (const Slot& slot : slots_) {
-        if (slot.serial != 0 && slot.player.since_us != 0) {
+        if (slot.serial != 0 && slot.player.started_us != 0) {
             sessions.emplace(SessionOf(slot));
         }
     }
     return sessions;
 }
 
-std::vector<Slot*> SlotTable::SurplusPlayers(std::string_view session, pid_t holder) const {
+std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newest) const {
     std::vector<Slot*> others;
     const Slot* owner = nullptr;
     for (Slot& slot : slots_) {
-        if (slot.serial != 0 && slot.pid == holder && SessionOf(slot) == session) {
+        if (slot.serial != 0 && slot.pid == newest && SessionOf(slot) == session) {
             owner = &slot;
         } else if (IsPlayerOf(slot, session)) {
             others.push_back(&slot);
         }
     }
-    if (holder <= 0 || owner == nullptr) {
+    if (newest <= 0 || owner == nullptr) {
         return {};
     }
     std::sort(others.begin(), others.end(),
-              [](const Slot* left, const Slot* right) { return left->player.since_us > right->player.since_us; });
-    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(owner->player.side_by_side - 1));
+              [](const Slot* left, const Slot* right) { return left->player.started_us > right->player.started_us; });
+    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(owner->player.max_players - 1));
     others.erase(others.begin(), others.begin() + static_cast<std::ptrdiff_t>(staying));
     return others;
 }
@@ -147,7 +147,7 @@ void SlotTable::Wake() {
     [[maybe_unused]] const ssize_t written = ::write(wake_.Get(), &one, sizeof one);
 }
 
-void SlotTable::TakeWake() {
+void SlotTable::ClearWake() {
     std::uint64_t count = 0;
     [[maybe_unused]] const ssize_t got = ::read(wake_.Get(), &count, sizeof count);
 }

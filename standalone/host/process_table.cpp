@@ -79,7 +79,7 @@ void ProcessTable::LeaveAll() {
 
 void ProcessTable::LeaveEnded() {
     for (auto& [pid, process] : processes_) {
-        if (process.slot->has_ended) {
+        if (process.slot->must_end) {
             BeginLeaving(process);
         }
     }
@@ -88,7 +88,7 @@ void ProcessTable::LeaveEnded() {
 void ProcessTable::BeginLeaving(Process& process) {
     if (!process.leaves_since) {
         process.leaves_since = process.next_signal = Clock::now();
-        process.slot->has_ended = true;
+        process.slot->must_end = true;
     }
 }
 
@@ -109,7 +109,7 @@ void ProcessTable::Reap(pid_t pid) {
 
 void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {
     control::SweepPlayerFile(control::SessionOf(slot), pid);
-    if (slot.player.since_us != 0) {
+    if (slot.player.started_us != 0) {
         try {
             control::ProgressFile::Sweep(progress_folder_, slot.player.key, pid);
         } catch (const std::exception& error) {
@@ -121,9 +121,9 @@ void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {
 bool ProcessTable::SignalSurplus() {
     bool again = false;
     for (const std::string& session : slots_.SessionsWithPlayers()) {
-        for (const control::Slot* slot : slots_.SurplusPlayers(session, control::ReadPlayerFile(session))) {
+        for (const control::Slot* slot : slots_.ExcessPlayers(session, control::ReadPlayerFile(session))) {
             if (const auto found = processes_.find(slot->pid); found != processes_.end()) {
-                found->second.slot->player.is_surplus = true;
+                found->second.slot->player.is_excess = true;
                 Signal(found->second.pidfd, SIGUSR1);
                 again = true;
             }
@@ -136,7 +136,7 @@ bool ProcessTable::SignalPauses() {
     bool again = false;
     for (auto& [pid, process] : processes_) {
         control::Player& player = process.slot->player;
-        if (player.since_us == 0 || player.pause_wanted == player.paused) {
+        if (player.started_us == 0 || player.pause_requested == player.paused) {
             continue;
         }
         if (IsPending(pid, SIGUSR2)) {

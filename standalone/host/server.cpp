@@ -95,7 +95,7 @@ void Server::Handle(Kind kind, std::uint32_t id) {
     case Kind::kSignals:
         return BeginShutdown();
     case Kind::kWake:
-        slots_.TakeWake();
+        slots_.ClearWake();
         processes_.LookAtPlayers();
         return processes_.LeaveEnded();
     case Kind::kWatcher:

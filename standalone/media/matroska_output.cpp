@@ -11,6 +11,7 @@
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/io.h"
 #include "standalone/media/source.h"
 
 extern "C" {
@@ -91,13 +92,9 @@ MatroskaOutput::MatroskaOutput(int descriptor, bool seekable) : descriptor_(desc
 
 int MatroskaOutput::WriteBytes(void* self, std::uint8_t* data, int size) {
     auto& output = *static_cast<MatroskaOutput*>(self);
-    for (int done = 0; done < size;) {
-        const ssize_t written = ::write(output.descriptor_, data + done, static_cast<std::size_t>(size - done));
-        if (written < 0 && errno != EINTR) {
-            output.errno_ = output.errno_ == 0 ? errno : output.errno_;
-            return AVERROR(output.errno_);
-        }
-        done += static_cast<int>(std::max<ssize_t>(written, 0));
+    if (!base::WriteAll(output.descriptor_, data, static_cast<std::size_t>(size))) {
+        output.errno_ = output.errno_ == 0 ? errno : output.errno_;
+        return AVERROR(output.errno_);
     }
     return size;
 }

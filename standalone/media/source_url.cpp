@@ -3,25 +3,15 @@
 
 #include <cctype>
 
+#include "standalone/base/text.h"
+
 namespace lookhaven::media {
 
 namespace {
 
 constexpr std::size_t kMaxUserInfoChars = 127;  // libav's RTSP client keeps 128 bytes
 
-std::string PercentEncode(std::string_view text) {
-    constexpr char kHex[] = "0123456789ABCDEF";
-    std::string encoded;
-    for (const char c : text) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (std::isalnum(byte) != 0 || c == '-' || c == '.' || c == '_' || c == '~' || c == '!' || c == '*') {
-            encoded += c;
-        } else {
-            encoded += {'%', kHex[byte >> 4], kHex[byte & 15]};
-        }
-    }
-    return encoded;
-}
+constexpr std::string_view kUnescaped = "-._~!*";
 
 }  // namespace
 
@@ -38,7 +28,8 @@ std::string WithCredentials(const std::string& url, const Credentials& credentia
     if (host == url.npos || (credentials.user.empty() && credentials.password.empty())) {
         return url;
     }
-    const std::string user_info = PercentEncode(credentials.user) + ':' + PercentEncode(credentials.password);
+    const std::string user_info =
+        base::PercentEncode(credentials.user, kUnescaped) + ':' + base::PercentEncode(credentials.password, kUnescaped);
     if (user_info.size() > kMaxUserInfoChars) {
         throw SourceError("the camera's user name and password are too long together");
     }

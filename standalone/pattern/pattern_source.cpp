@@ -8,6 +8,7 @@
 #include <map>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/text.h"
 #include "standalone/media/pace.h"
 #include "standalone/pattern/pattern_audio.h"
 #include "standalone/pattern/pattern_encoder.h"
@@ -23,21 +24,6 @@ struct PatternUrl {
     std::map<std::string, std::string> parameters;
 };
 
-std::string PercentDecode(std::string_view text) {
-    std::string decoded;
-    for (std::size_t i = 0; i < text.size(); ++i) {
-        unsigned int byte = 0;
-        if (text[i] == '%' && i + 2 < text.size() &&
-            std::from_chars(&text[i + 1], &text[i + 1] + 2, byte, 16).ptr == &text[i + 1] + 2) {
-            decoded += static_cast<char>(byte);
-            i += 2;
-        } else {
-            decoded += text[i] == '+' ? ' ' : text[i];
-        }
-    }
-    return decoded;
-}
-
 PatternUrl ParsePatternUrl(std::string_view text) {
     PatternUrl url;
     url.name = text.substr(0, text.find('?'));
@@ -47,7 +33,7 @@ PatternUrl ParsePatternUrl(std::string_view text) {
         text.remove_prefix(std::min(pair.size() + 1, text.size()));
         const std::size_t equals = std::min(pair.find('='), pair.size());
         url.parameters[std::string(pair.substr(0, equals))] =
-            PercentDecode(pair.substr(std::min(equals + 1, pair.size())));
+            *base::DecodeForm(pair.substr(std::min(equals + 1, pair.size())), base::BrokenEscape::kKeep);
     }
     return url;
 }

@@ -11,6 +11,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 
 namespace lookhaven::recorder {
 
@@ -25,8 +26,7 @@ InstanceLock::InstanceLock(const base::Installation& installation) {
                                  base::ReadFile(path) + ")");
     }
     const std::string pid = std::to_string(::getpid());
-    if (::ftruncate(file_.Get(), 0) != 0 ||
-        ::pwrite(file_.Get(), pid.data(), pid.size(), 0) != static_cast<ssize_t>(pid.size())) {
+    if (::ftruncate(file_.Get(), 0) != 0 || !base::WriteAllAt(file_.Get(), pid.data(), pid.size(), 0)) {
         base::ThrowErrno("cannot write " + path.string());
     }
 }

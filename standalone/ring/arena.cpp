@@ -22,7 +22,7 @@ std::uint32_t High(std::int64_t value) {
 }  // namespace
 
 Arena::Arena(const View& view) : view_(view), readers_(view) {
-    // A predecessor may have died between naming an entry and raising the newest count.
+    // A predecessor may have died after it added an entry to the index, before it raised the newest count.
     newest_ = view_.Head().newest.load();
     for (std::uint32_t i = 0; i < view_.Head().index_slots; ++i) {
         newest_ = std::max(newest_, view_.Slot(i).count.load());
@@ -43,7 +43,7 @@ void Arena::StartRun() {
 }
 
 std::uint64_t Arena::OldestStart() const {
-    return Place::FromWord(view_.Slot(oldest_).place.load(std::memory_order_relaxed)).first;
+    return Region::FromWord(view_.Slot(oldest_).region.load(std::memory_order_relaxed)).first;
 }
 
 void Arena::DropOldest() {
@@ -54,21 +54,21 @@ void Arena::DropOldest() {
     ++oldest_;
 }
 
-// Takes out what lies between the cursor and the end of the place, which is the oldest part of the ring.
-void Arena::DropUpTo(const Place& place) {
+// Removes from the index what lies between the cursor and the end of the region: the oldest entries.
+void Arena::DropUpTo(const Region& region) {
     std::uint32_t from = cursor_;
-    if (place.first < cursor_) {
+    if (region.first < cursor_) {
         while (!IsEmpty() && OldestStart() >= cursor_) {
             DropOldest();
         }
         from = 0;
     }
-    while (!IsEmpty() && OldestStart() >= from && OldestStart() < place.End()) {
+    while (!IsEmpty() && OldestStart() >= from && OldestStart() < region.End()) {
         DropOldest();
     }
 }
 
-std::optional<Place> Arena::ChoosePlace(std::uint32_t blocks) const {
+std::optional<Region> Arena::ChooseRegion(std::uint32_t blocks) const {
     std::uint64_t first = cursor_;
     for (bool wrapped = false;;) {
         if (first + blocks > view_.Head().arena_blocks) {
@@ -79,39 +79,39 @@ std::optional<Place> Arena::ChoosePlace(std::uint32_t blocks) const {
             first = 0;
             continue;
         }
-        const Place place{static_cast<std::uint32_t>(first), blocks};
-        const std::uint64_t pinned_until = readers_.PinnedUntil(place);
+        const Region region{static_cast<std::uint32_t>(first), blocks};
+        const std::uint64_t pinned_until = readers_.PinnedUntil(region);
         if (pinned_until == 0) {
-            return place;
+            return region;
         }
         first = pinned_until;
     }
 }
 
-std::optional<Place> Arena::MakeRoom(std::uint32_t blocks) {
-    // A reader may pin an entry between the choice and the dropping, but no dropped entry afterwards: each further try
-    // has one more pin that stays, so there are at most as many as readers.
+std::optional<Region> Arena::Reserve(std::uint32_t blocks) {
+    // A reader may pin an entry after the region was chosen, but none once the entry is dropped: each further try sees
+    // at least one more pin, so there are at most as many tries as readers.
     for (std::uint32_t tries = 0; tries <= kReaderSlots; ++tries) {
-        const std::optional<Place> place = ChoosePlace(blocks);
-        if (!place) {
+        const std::optional<Region> region = ChooseRegion(blocks);
+        if (!region) {
             return std::nullopt;
         }
-        DropUpTo(*place);
-        if (readers_.PinnedUntil(*place) == 0) {
-            cursor_ = static_cast<std::uint32_t>(place->End());
-            return place;
+        DropUpTo(*region);
+        if (readers_.PinnedUntil(*region) == 0) {
+            cursor_ = static_cast<std::uint32_t>(region->End());
+            return region;
         }
     }
     return std::nullopt;
 }
 
-void Arena::Append(const Place& place, const Frame& frame, bool is_key) {
+void Arena::Append(const Region& region, const Frame& frame, bool is_key) {
     SegmentHead& head = view_.Head();
     while (!IsEmpty() && newest_ + 1 - oldest_ >= head.index_slots) {
         DropOldest();
     }
     const std::uint64_t count = newest_ + 1;
-    unsigned char* memory = view_.Memory(place);
+    unsigned char* memory = view_.Memory(region);
     auto& entry = *new (memory) Entry{};
     entry.length = static_cast<std::int32_t>(frame.data.size());
     entry.sequence = SequenceOf(count);
@@ -126,10 +126,10 @@ void Arena::Append(const Place& place, const Frame& frame, bool is_key) {
     std::memcpy(memory + sizeof(Entry), frame.data.data(), frame.data.size());
 
     IndexSlot& slot = view_.Slot(count);
-    slot.place.store(place.Word());
+    slot.region.store(region.Word());
     slot.count.store(count);
     newest_ = count;
-    // Readers go no further than the newest count, so it is raised before anything else names the entry.
+    // Readers read no further than the newest count, so it is raised before newest_key names the entry.
     head.newest.store(count);
     if (is_key) {
         head.newest_key.store(count);

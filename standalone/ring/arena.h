@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Places entries in a segment's arena and index, for the one process that writes it.
+// Allocates entries in a segment's arena and index, for the one process that writes it.
 //
-// Algorithm     The arena fills from its beginning to its end and again. Before a region is used, the entries in it and
-//               all older ones leave the index. A region that a reader has pinned is skipped: the next place behind it is
-//               tried, once round the arena. So a reader costs the ring at most what it holds pinned.
+// Algorithm     The arena is filled from its beginning to its end, then from the beginning again. Before a region is
+//               used, the entries in it and all older ones are removed from the index. A region that a reader has
+//               pinned is skipped: the next one behind it is tried, at most once through the whole arena. So a reader
+//               costs the ring at most what it has pinned.
 // Invariants    (1) The entries oldest_ … newest_ are live, all others are not.
-//               (2) Live entries from cursor_ to the end of the arena are older than those before cursor_, and within
-//               both parts later places are younger.
+//               (2) Live entries from cursor_ to the end of the arena are older than those before cursor_; within both
+//               parts, entries are in the order of their age.
 #pragma once
 
 #include <cstdint>
@@ -15,26 +16,26 @@
 
 #include "standalone/ring/reader_table.h"
 #include "standalone/ring/segment.h"
-#include "standalone/ring/writer.h"
+#include "standalone/ring/stream.h"
 
 namespace lookhaven::ring {
 
 class Arena {
   public:
-    // The segment must be this process's to write and stay attached. Begins a new run in it.
+    // This process must be the segment's writer and keep it attached. Begins a new run.
     explicit Arena(const View& view);
 
-    // Takes every entry out of the index; the counts go on.
+    // Removes every entry from the index; the counts continue.
     void StartRun();
 
-    // A place of that many blocks that nobody reads, with no live entry in it; nothing when what readers hold leaves no
-    // room. It is the caller's until the next call.
-    std::optional<Place> MakeRoom(std::uint32_t blocks);
+    // A region of that many blocks without a live entry or a pin; nothing when what readers have pinned leaves no
+    // space. It stays reserved until the next call.
+    std::optional<Region> Reserve(std::uint32_t blocks);
 
-    // Fills the place, which holds the frame, and makes it the newest entry.
-    void Append(const Place& place, const Frame& frame, bool is_key);
+    // Writes the frame to the reserved region, which must be large enough, as the newest entry.
+    void Append(const Region& region, const Frame& frame, bool is_key);
 
-    // The newest key frame of this run had to make room: the arena does not hold a group of pictures.
+    // The newest key frame of this run was overwritten: the arena does not hold a group of pictures.
     bool HasLostKeyFrame() const { return has_lost_key_frame_; }
 
     static std::uint32_t BlocksFor(std::size_t data_bytes) {
@@ -45,8 +46,8 @@ class Arena {
     bool IsEmpty() const { return oldest_ > newest_; }
     std::uint64_t OldestStart() const;
     void DropOldest();
-    void DropUpTo(const Place& place);
-    std::optional<Place> ChoosePlace(std::uint32_t blocks) const;
+    void DropUpTo(const Region& region);
+    std::optional<Region> ChooseRegion(std::uint32_t blocks) const;
 
     View view_;
     ReaderTable readers_;

@@ -30,7 +30,7 @@ void ForEachRingKey(const std::function<void(int shm_id, const shmid_ds&)>& call
     }
 }
 
-// Calls back for each segment of the installation; others and those that vanish meanwhile are passed over.
+// Calls back for each segment of the installation; others and those that vanish meanwhile are skipped.
 void ForEachSegment(std::uint64_t installation,
                     const std::function<void(const Attachment&, SegmentCheck, const shmid_ds&)>& call) {
     ForEachRingKey([&](int shm_id, const shmid_ds& status) {
@@ -48,7 +48,7 @@ void ForEachSegment(std::uint64_t installation,
     });
 }
 
-// Claims the dead writer's ring, so that no new writer adopts it meanwhile, and removes it.
+// Becomes the dead writer's successor, so that no new writer adopts the ring meanwhile, and removes it.
 bool RemoveDeadWriters(const Attachment& attachment) {
     SegmentHead& head = View(attachment.Address()).Head();
     std::uint64_t writer = head.writer.load();

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which segments an installation has in the system, and which of them nobody needs any more.
+// Lists an installation's segments and removes those that dead processes left.
 #pragma once
 
 #include <cstddef>
@@ -26,7 +26,7 @@ struct SegmentState {
     std::uint32_t readers = 0;
 };
 
-// The segments of the installation that still have a name; retired ones vanish by themselves.
+// The segments of the installation that still have a key; retired ones vanish with their last attachment.
 std::vector<SegmentState> ListSegments(const base::Installation& installation);
 
 // Removes the segments that a dead writer left and that nobody has attached; those with viewers stay, to be adopted.

@@ -12,8 +12,8 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/futex.h"
 #include "standalone/base/log.h"
+#include "standalone/ring/pinned_read.h"
 #include "standalone/ring/process_word.h"
-#include "standalone/ring/reading.h"
 
 namespace lookhaven::ring {
 
@@ -36,9 +36,9 @@ void* Attach(const base::Installation& installation, const StreamId& id) try {
         return nullptr;
     }
     if (found->check != SegmentCheck::kGood) {
-        // Said once, for whoever waits for a ring asks again and again.
-        static std::atomic_flag said;
-        if (said.test_and_set()) {
+        // Logged once, since callers that wait for a ring try again and again.
+        static std::atomic_flag logged;
+        if (logged.test_and_set()) {
             return nullptr;
         }
         base::LogError("the ring of camera " + std::to_string(id.camera) + " stream " + std::to_string(id.stream) +
@@ -48,10 +48,10 @@ void* Attach(const base::Installation& installation, const StreamId& id) try {
         return nullptr;
     }
     void* ring = found->attachment.Release();
-    ForgetLoosePins(ring);
+    ForgetProcessPins(ring);
     return ring;
 } catch (const std::system_error&) {
-    return nullptr;  // removed between finding and looking
+    return nullptr;  // removed meanwhile
 }
 
 void* AttachEmpty(const StreamId& id, const StreamFormat& format) {
@@ -70,15 +70,15 @@ void StartRead(void* ring, Position* position) {
         *position = Position{};
         position->generation = view.Head().generation;
         position->reader = ReaderTable(view).Claim();
-        // A stream comes through the whole ring again and again. Mapping it now, at one go, is cheaper than a page fault
-        // for every few pages of its first round. Kernels that know no such call fault as before.
+        // A stream reads the whole ring over and over. Mapping all its pages now is cheaper than a page fault for every
+        // few of them later. Kernels without this call take the page faults.
         ::madvise(ring, view.Head().segment_bytes, MADV_POPULATE_READ);
     }
 }
 
 void StopRead(void* ring, Position* position) {
     if (position == nullptr) {
-        ReleaseLoosePins(ring, nullptr);
+        ReleaseProcessPins(ring, nullptr);
         return;
     }
     if (position->generation == View(ring).Head().generation) {
@@ -89,21 +89,21 @@ void StopRead(void* ring, Position* position) {
 }
 
 const Entry* ReadLatest(void* ring) {
-    Reading reading(ring, nullptr);
-    return reading ? reading.PinNamedBy(reading.Head().newest) : nullptr;
+    PinnedRead read(ring, nullptr);
+    return read ? read.PinCurrent(read.Head().newest) : nullptr;
 }
 
 const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int wait_millis) {
-    Reading reading(ring, position);
-    if (!reading) {
+    PinnedRead read(ring, position);
+    if (!read) {
         return nullptr;
     }
-    const SegmentHead& head = reading.Head();
+    const SegmentHead& head = read.Head();
     const std::int64_t deadline = base::MonotonicMicros() + std::clamp(wait_millis, 0, kMaxWaitMillis) * 1000;
     for (;;) {
         const std::uint32_t wake = head.wake.load();
-        if (head.newest.load() != reading.LastCount(last_sequence)) {
-            if (const Entry* entry = reading.PinNamedBy(head.newest)) {
+        if (head.newest.load() != read.LastCount(last_sequence)) {
+            if (const Entry* entry = read.PinCurrent(head.newest)) {
                 return entry;
             }
         }
@@ -116,35 +116,35 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
 }
 
 const Entry* ReadNext(void* ring, int last_sequence, Position* position) {
-    Reading reading(ring, position);
-    if (!reading) {
+    PinnedRead read(ring, position);
+    if (!read) {
         return nullptr;
     }
-    const SegmentHead& head = reading.Head();
-    const std::uint64_t last = reading.LastCount(last_sequence);
+    const SegmentHead& head = read.Head();
+    const std::uint64_t last = read.LastCount(last_sequence);
     const std::uint64_t newest = head.newest.load();
     if (last == newest) {
         return nullptr;
     }
-    // Never past the newest: the entry behind it may be named already by a writer that dies before it counts.
-    if (last < newest && reading.IsLive(last)) {
-        if (const Entry* entry = reading.Pin(last + 1)) {
+    // Never past the newest: a writer may die after it adds an entry to the index, before it raises the newest count.
+    if (last < newest && read.IsLive(last)) {
+        if (const Entry* entry = read.Pin(last + 1)) {
             return entry;
         }
     }
-    return reading.PinNamedBy(head.newest_key);  // of an audio ring the newest entry
+    return read.PinCurrent(head.newest_key);  // of an audio ring the newest entry
 }
 
 const Entry* ReadLatestIFrame(void* ring) {
-    Reading reading(ring, nullptr);
-    return reading ? reading.PinNamedBy(reading.Head().newest_key) : nullptr;
+    PinnedRead read(ring, nullptr);
+    return read ? read.PinCurrent(read.Head().newest_key) : nullptr;
 }
 
 void ReadFinish(void* ring, const Entry* entry, Position* position) {
     if (position != nullptr) {
         Unpin(ring, *position);
     } else if (entry != nullptr) {
-        ReleaseLoosePins(ring, entry);
+        ReleaseProcessPins(ring, entry);
     }
 }
 
@@ -163,7 +163,7 @@ bool IsWriterAlive(const void* ring) {
 bool HasFrameOfThisStart(const void* ring) {
     const View view(ring);
     const std::uint64_t writer = view.Head().writer.load();
-    // Asked in this order: while the index is this writer's, what it names was written by it.
+    // In this order: while the index is this writer's, it wrote what the index names.
     if (!IsWordAlive(writer) || view.Head().index_of.load() != writer) {
         return false;
     }

@@ -3,10 +3,10 @@
 // Reads one stream from its ring, straight out of shared memory.
 //
 // Why so        A viewer sends a frame from the ring without copying it. So a reader pins the entry that it is sending,
-//               and the writer goes round pinned entries. All functions take the address of the attachment itself,
-//               since that is all that the caller of a ring holds, and gives to shmdt.
+//               and the writer skips pinned entries. All functions take the address of the attachment itself, since
+//               that is all that a ring's caller holds, and passes to shmdt.
 // Invariants    (1) An entry between a read and its finish call is never written to.
-//               (2) Sizes and places read from the segment are checked before use.
+//               (2) Sizes and offsets read from the segment are checked before use.
 // Thread safety One thread per position; any number of readers in any process. The functions that take no position, or
 //               a null one, may be called from any thread.
 #pragma once
@@ -21,11 +21,11 @@
 namespace lookhaven::ring {
 
 // One reader's position in one ring; the caller keeps it and leaves its contents to these functions. A forked child
-// must not use its parent's: its reads give null.
+// must not use its parent's: its reads return null.
 struct Position {
     std::uint64_t count = 0;       // of the last entry read
-    std::int32_t reader = -1;      // place in the ring's reader table
-    std::int32_t pinned = -1;      // place in the ring's index of the entry being sent
+    std::int32_t reader = -1;      // slot in the ring's reader table; -1: none
+    std::int32_t pinned = -1;      // index slot of the entry that is pinned; -1: none
     std::uint32_t generation = 0;  // of the ring
 };
 
@@ -42,9 +42,9 @@ void* AttachEmpty(const StreamId& id, const StreamFormat& format);
 void Detach(void* ring);
 
 // Makes the position a reader of the ring; nothing is read yet. When the table is full of living readers the position
-// stays without a place, and its reads give null. A null position needs neither StartRead nor StopRead.
+// gets no slot, and its reads return null. A null position needs neither StartRead nor StopRead.
 void StartRead(void* ring, Position* position);
-// Ends the position's reading: unpins what is pinned and frees the place. With null: whatever this process has pinned
+// Ends the position's reading: unpins its entry and frees its slot. With null: unpins whatever this process has pinned
 // in the ring without a position.
 void StopRead(void* ring, Position* position);
 
@@ -59,17 +59,17 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position);
 // The newest key frame, or null. Pinned for the process until ReadIFrameFinish.
 const Entry* ReadLatestIFrame(void* ring);
 
-// Gives back what the position holds pinned, or, with a null position, this entry; a null entry does nothing.
+// Unpins the position's entry or, with a null position, this entry; a null entry does nothing.
 void ReadFinish(void* ring, const Entry* entry, Position* position);
 void ReadIFrameFinish(void* ring, const Entry* entry, Position* position);
 
 // The writer has left this ring for good; a reader should attach anew.
 bool IsRetired(const void* ring);
-// The process that writes the ring lives. Costs a look into /proc: not for each frame.
+// The process that writes the ring is alive. Reads /proc: not for each frame.
 bool IsWriterAlive(const void* ring);
 // The ring holds an entry that its present writer wrote since it started; false while that writer is dead.
 bool HasFrameOfThisStart(const void* ring);
-// Microseconds since the writer last gave a sign of life.
+// Microseconds since the writer's last heartbeat.
 std::int64_t HeartbeatAgeMicros(const void* ring);
 
 // The format, alive as long as the attachment; never null.

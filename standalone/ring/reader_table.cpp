@@ -9,8 +9,8 @@ namespace lookhaven::ring {
 
 namespace {
 
-// Makes the place this process's if its owner is the one given. The exchange decides between several who try; only the
-// winner may touch the pin.
+// Makes the slot this process's if its owner is the one given. The exchange decides between several that try; only the
+// winner may change the pin.
 bool TakeFrom(ReaderSlot& slot, std::uint64_t owner) {
     if (!slot.owner.compare_exchange_strong(owner, OwnWord())) {
         return false;
@@ -51,11 +51,11 @@ ReaderSlot* ReaderTable::Own(int reader) const {
     return slot.owner.load() == OwnWord() ? &slot : nullptr;
 }
 
-std::uint64_t ReaderTable::PinnedUntil(const Place& place) const {
+std::uint64_t ReaderTable::PinnedUntil(const Region& region) const {
     std::uint64_t end = 0;
     for (ReaderSlot& slot : slots_) {
-        const Place pin = Place::FromWord(slot.pin.load());
-        if (pin.blocks == 0 || !pin.Overlaps(place)) {
+        const Region pin = Region::FromWord(slot.pin.load());
+        if (pin.blocks == 0 || !pin.Overlaps(region)) {
             continue;
         }
         const std::uint64_t owner = slot.owner.load();

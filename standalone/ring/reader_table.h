@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The table of a ring's readers: who holds a place, and which region of the arena each is sending.
+// The reader table of a segment: which processes read, and which region of the arena each reader has pinned.
 //
 // Thread safety Any thread and process.
 #pragma once
@@ -15,17 +15,17 @@ class ReaderTable {
   public:
     explicit ReaderTable(const View& view) : slots_(view.Readers()) {}
 
-    // A place owned by this process, or -1 when living readers hold them all. Dead readers' places are taken over only
-    // when no place is free.
+    // Claims a slot for this process; -1 when living readers hold them all. Slots of dead readers are taken over only
+    // when none is free.
     int Claim();
-    // Unpins and frees the place.
+    // Unpins and frees the slot, if this process owns it.
     void Release(int reader);
-    // The place if this process owns it, else null.
+    // The slot, null unless this process owns it.
     ReaderSlot* Own(int reader) const;
 
-    // Where the pins of living readers that overlap the place end, in blocks; 0 when there are none. Frees the places of
-    // dead readers that it finds in the way.
-    std::uint64_t PinnedUntil(const Place& place) const;
+    // The highest end, in blocks, of living readers' pins that overlap the region; 0 when there are none. Frees the
+    // slots of dead readers whose pins overlap it.
+    std::uint64_t PinnedUntil(const Region& region) const;
 
     std::uint32_t Used() const;
 

@@ -146,19 +146,19 @@ IndexSlot& View::Slot(std::uint64_t count) const {
     return reinterpret_cast<IndexSlot*>(base_ + kIndexOffset)[count % Head().index_slots];
 }
 
-unsigned char* View::Memory(const Place& place) const {
-    return base_ + ArenaOffset(Head().index_slots) + std::uint64_t{place.first} * kBlockBytes;
+unsigned char* View::Memory(const Region& region) const {
+    return base_ + ArenaOffset(Head().index_slots) + std::uint64_t{region.first} * kBlockBytes;
 }
 
-const Entry* View::EntryAt(const Place& place) const {
-    if (place.blocks == 0 || place.End() > Head().arena_blocks) {
+const Entry* View::EntryAt(const Region& region) const {
+    if (region.blocks == 0 || region.End() > Head().arena_blocks) {
         return nullptr;
     }
-    const auto* entry = reinterpret_cast<const Entry*>(Memory(place));
+    const auto* entry = reinterpret_cast<const Entry*>(Memory(region));
     const bool possible =
         entry->length >= 1 && entry->length <= base::kMaxFrameBytes && entry->offset >= 0 &&
         entry->offset < entry->length &&
-        sizeof(Entry) + static_cast<std::uint64_t>(entry->length) <= std::uint64_t{place.blocks} * kBlockBytes;
+        sizeof(Entry) + static_cast<std::uint64_t>(entry->length) <= std::uint64_t{region.blocks} * kBlockBytes;
     return possible ? entry : nullptr;
 }
 

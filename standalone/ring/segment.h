@@ -8,19 +8,19 @@
 //               Counts begin at 1 and never repeat; the sequence number is (c - 1) % 10001.
 //
 // Protocol      Writer, to reuse a region: sets the counts of the index slots that describe it to 0, then looks through
-//               the pins. Reader, to use an entry: reads its slot, stores the place as its pin, then reads the slot's
-//               count again. All of these are sequentially consistent, so of a writer and a reader that meet, the writer
-//               sees the pin, or the reader sees that the entry is gone. The writer goes round pinned regions.
+//               the pins. Reader, to use an entry: reads its slot, stores the region as its pin, then reads the slot's
+//               count again. All of these are sequentially consistent, so of a writer and a reader that meet, the
+//               writer sees the pin, or the reader sees that the entry is gone. The writer skips pinned regions.
 //
 // Invariants    (1) All but the changing part of the head is constant once magic is there.
-//               (2) A slot's place changes only while its count is 0, and no count is used twice.
+//               (2) A slot's region changes only while its count is 0, and no count is used twice.
 //               (3) A reader slot's pin belongs to its owner; a free slot has no pin.
 //
-// Crash rule    Every step leaves the segment valid. A segment without magic is unfinished, and nobody's once its creator
-//               is dead. A writer that dies between two steps leaves at worst an entry that the index does not name; the
-//               next writer takes every entry out of the index and begins behind the highest count. A reader that dies
-//               leaves a slot whose owner is dead; whoever finds it in the way frees it. Owners are one word of process
-//               id and start time, so owning and letting go is one store.
+// Crash rule    Every step leaves the segment valid. A segment without magic is unfinished, and nobody's once its
+//               creator is dead. A writer that dies between two steps leaves at worst an entry that the index does not
+//               name; the next writer removes every entry from the index and begins behind the highest count. A reader
+//               that dies leaves a slot whose owner is dead; whoever needs it frees it. An owner is one word of process
+//               id and start time, so owning and releasing is one store.
 #pragma once
 
 #include <atomic>
@@ -75,24 +75,24 @@ struct SegmentHead {
 
 struct ReaderSlot {
     std::atomic<std::uint64_t> owner;  // process word, 0 when free
-    std::atomic<std::uint64_t> pin;    // Place, 0 when nothing is pinned
+    std::atomic<std::uint64_t> pin;    // Region, 0 when nothing is pinned
 };
 
 struct IndexSlot {
     std::atomic<std::uint64_t> count;  // 0 when the slot describes nothing
-    std::atomic<std::uint64_t> place;
+    std::atomic<std::uint64_t> region;
 };
 static_assert(std::atomic<std::uint64_t>::is_always_lock_free, "segments are shared between processes");
 
 // A region of the arena, in blocks.
-struct Place {
+struct Region {
     std::uint32_t first = 0;
     std::uint32_t blocks = 0;
 
     std::uint64_t End() const { return std::uint64_t{first} + blocks; }
-    bool Overlaps(const Place& other) const { return first < other.End() && other.first < End(); }
+    bool Overlaps(const Region& other) const { return first < other.End() && other.first < End(); }
     std::uint64_t Word() const { return (std::uint64_t{blocks} << 32) | first; }
-    static Place FromWord(std::uint64_t word) {
+    static Region FromWord(std::uint64_t word) {
         return {static_cast<std::uint32_t>(word), static_cast<std::uint32_t>(word >> 32)};
     }
 };
@@ -109,10 +109,10 @@ class View {
     SegmentHead& Head() const { return *reinterpret_cast<SegmentHead*>(base_); }
     std::span<ReaderSlot> Readers() const;
     IndexSlot& Slot(std::uint64_t count) const;
-    // Raw memory of the place, which must lie inside the arena.
-    unsigned char* Memory(const Place& place) const;
-    // The entry there, or null when place or entry is impossible. The caller has it pinned.
-    const Entry* EntryAt(const Place& place) const;
+    // Raw memory of the region, which must lie inside the arena.
+    unsigned char* Memory(const Region& region) const;
+    // The entry there, or null when region or entry is impossible. The caller has it pinned.
+    const Entry* EntryAt(const Region& region) const;
     StreamId Id() const;
     StreamFormat Format() const;
     Geometry Size() const;
@@ -138,7 +138,7 @@ class Attachment {
     explicit operator bool() const { return address_ != nullptr; }
     // Hands the attachment to the caller, who detaches it.
     void* Release();
-    // Takes the segment's name away: it vanishes with its last attachment.
+    // Removes the segment's key: nobody finds it any more, and it vanishes with its last attachment.
     void RemoveSegment() const;
 
   private:
@@ -148,7 +148,7 @@ class Attachment {
 
 enum class SegmentCheck { kGood, kUnfinished, kNotARing, kOtherLayout, kDamaged };
 
-// Judges what lies at the address of an attachment that is real_bytes long.
+// Checks what is at the address of an attachment that is real_bytes long.
 SegmentCheck CheckSegment(const void* address, std::uint64_t real_bytes);
 
 std::uint64_t SegmentBytes(const Geometry& geometry);
@@ -160,7 +160,7 @@ bool IsRingKey(key_t key);
 // would. What may be another program's or another installation's stays.
 bool RemoveIfAbandoned(std::uint64_t installation, int shm_id);
 
-// A segment with the stream's identity, as found; a retired one is passed over.
+// A segment with the stream's identity; retired ones are skipped.
 struct FoundSegment {
     Attachment attachment;
     SegmentCheck check = SegmentCheck::kGood;

@@ -17,7 +17,7 @@ Geometry GeometryFor(const StreamEstimate& estimate) {
                                                      : kUnknownVideoBits;
     const double largest = static_cast<double>(std::max<std::int64_t>(estimate.largest_frame_bytes, 0));
     const double fps = estimate.frames_per_second > 0 ? estimate.frames_per_second : is_audio ? 50 : 30;
-    // Room for several of the largest frames lets the writer go round what slow viewers are sending.
+    // Space for several of the largest frames lets the writer skip what slow viewers are sending.
     const double bytes = std::max(bits / 8 * seconds, 16 * largest);
     const auto arena = static_cast<std::uint64_t>(std::clamp(bytes, is_audio ? 65536.0 : 1048576.0, 268435456.0));
     const auto slots = static_cast<std::uint32_t>(std::clamp(fps * seconds * 1.5, 128.0, 8192.0));

@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -62,6 +63,15 @@ constexpr std::int32_t kLastSequence = 10000;
 constexpr std::int32_t kNoSequence = 10001;
 
 constexpr std::uint32_t kKeyFrame = 2;  // bit of Entry::flags
+
+// One frame to write. The span is borrowed for the call.
+struct Frame {
+    std::span<const unsigned char> data;  // 1 … base::kMaxFrameBytes
+    std::int32_t offset = 0;              // of the picture within the data
+    bool is_key = false;
+    std::int64_t timestamp_micros = 0;
+    std::int64_t capture_millis = 0;  // UTC
+};
 
 // The head of one entry; its data follows directly. The picture or audio block is the length - offset bytes that begin
 // offset bytes into the data.

@@ -9,6 +9,7 @@
 #include <sys/stat.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/text.h"
 
@@ -140,11 +141,11 @@ std::string EmapPictures::Read(const std::string& name) const {
         throw std::system_error(EFBIG, std::generic_category(), path.string() + " is no picture file");
     }
     std::string bytes(static_cast<std::size_t>(about.st_size), '\0');
-    const ssize_t read = ::pread(file.Get(), bytes.data(), bytes.size(), 0);
-    if (read < 0) {
+    const std::optional<std::size_t> read = base::ReadAllAt(file.Get(), bytes.data(), bytes.size(), 0);
+    if (!read) {
         base::ThrowErrno("cannot read " + path.string());
     }
-    bytes.resize(static_cast<std::size_t>(read));
+    bytes.resize(*read);
     return bytes;
 }
 

@@ -8,6 +8,7 @@
 
 #include <sodium.h>
 
+#include "standalone/base/text.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
@@ -41,10 +42,7 @@ std::string MakePairToken(std::string_view secret, std::string_view timestamp) {
     std::array<unsigned char, crypto_auth_hmacsha256_BYTES> code{};
     crypto_auth_hmacsha256(code.data(), reinterpret_cast<const unsigned char*>(message.data()), message.size(),
                            key.data());
-    std::string token(kTokenDigits + 1, '\0');
-    sodium_bin2hex(token.data(), token.size(), code.data(), code.size());
-    token.resize(kTokenDigits);
-    return token;
+    return base::ToHex(code);
 }
 
 bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s) {

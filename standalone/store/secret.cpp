@@ -8,6 +8,8 @@
 
 #include <sodium.h>
 
+#include "standalone/base/text.h"
+
 namespace lookhaven::store {
 
 namespace {
@@ -21,13 +23,6 @@ void InitialiseSodium() {
     if (sodium_init() < 0) {
         throw std::runtime_error("the cryptographic library does not start");
     }
-}
-
-std::string Hex(const unsigned char* bytes, std::size_t size) {
-    std::string text(2 * size + 1, '\0');
-    sodium_bin2hex(text.data(), text.size(), bytes, size);
-    text.pop_back();
-    return text;
 }
 
 }  // namespace
@@ -53,7 +48,7 @@ std::string RandomHex(std::size_t size_bytes) {
     InitialiseSodium();
     std::vector<unsigned char> bytes(size_bytes);
     randombytes_buf(bytes.data(), bytes.size());
-    return Hex(bytes.data(), bytes.size());
+    return base::ToHex(bytes);
 }
 
 std::string Digest(std::string_view text) {
@@ -61,7 +56,7 @@ std::string Digest(std::string_view text) {
     std::array<unsigned char, 32> digest{};
     crypto_generichash(digest.data(), digest.size(), reinterpret_cast<const unsigned char*>(text.data()), text.size(),
                        nullptr, 0);
-    return Hex(digest.data(), digest.size());
+    return base::ToHex(digest);
 }
 
 }  // namespace lookhaven::store

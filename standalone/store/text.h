@@ -1,11 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What text may go into a record (both engines take all that passes here), and bytes as text.
+// Which text may go into a record: both engines store whatever passes here.
 #pragma once
 
 #include <cstddef>
-#include <optional>
-#include <string>
 #include <string_view>
 
 namespace lookhaven::store {
@@ -23,9 +21,5 @@ bool IsReservedName(std::string_view name);
 bool IsSource(std::string_view source);
 
 bool IsHex(std::string_view text, std::size_t digits);
-
-// With padding, without line breaks.
-std::string ToBase64(std::string_view bytes);
-std::optional<std::string> FromBase64(std::string_view text);
 
 }  // namespace lookhaven::store

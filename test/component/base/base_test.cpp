@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The ground that every process stands on: identities of processes, files that are replaced whole, the state folder.
-#include <cstdlib>
+// What every process relies on: process identities, files that are replaced whole, the state folder.
 #include <filesystem>
 #include <system_error>
 
@@ -15,42 +14,34 @@
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
 #include "standalone/base/process.h"
+#include "test/support/folder.h"
+#include "test/support/process.h"
 
 namespace lookhaven::base {
 namespace {
 
-class TemporaryFolder : public testing::Test {
+class FileTest : public testing::Test {
   protected:
-    TemporaryFolder() {
-        std::string pattern = testing::TempDir() + "lookhaven-base-XXXXXX";
-        path_ = ::mkdtemp(pattern.data());
-    }
-    ~TemporaryFolder() override { std::filesystem::remove_all(path_); }
-
-    std::filesystem::path path_;
+    const test::TemporaryFolder path_;
 };
 
 TEST(ProcessIdentityTest, ADeadProcessIsGoneEvenAsAZombieAndWhenItsIdIsReused) {
-    const pid_t child = ::fork();
-    if (child == 0) {
-        ::pause();
-        _exit(0);
-    }
-    const ProcessIdentity identity{child, ProcessStartTicks(child)};
+    test::KilledChild child([] {});
+    const ProcessIdentity identity{child.Pid(), ProcessStartTicks(child.Pid())};
     EXPECT_TRUE(IsAlive(identity));
-    EXPECT_FALSE(IsAlive({child, identity.start_ticks + 1})) << "another process under the same id";
-    EXPECT_FALSE(IsAlive({child, 0}));
+    EXPECT_FALSE(IsAlive({child.Pid(), identity.start_ticks + 1})) << "another process under the same id";
+    EXPECT_FALSE(IsAlive({child.Pid(), 0}));
     EXPECT_FALSE(IsAlive({0, identity.start_ticks}));
 
-    ::kill(child, SIGKILL);
+    ::kill(child.Pid(), SIGKILL);
     siginfo_t info{};
-    ::waitid(P_PID, static_cast<id_t>(child), &info, WEXITED | WNOWAIT);
+    ::waitid(P_PID, static_cast<id_t>(child.Pid()), &info, WEXITED | WNOWAIT);
     EXPECT_FALSE(IsAlive(identity)) << "a zombie holds nothing any more";
-    ::waitpid(child, nullptr, 0);
+    child.Kill();
     EXPECT_FALSE(IsAlive(identity));
 }
 
-TEST(ProcessIdentityTest, AProcessThatCannotBeLookedUpForWantOfDescriptorsIsNotDead) {
+TEST(ProcessIdentityTest, AProcessThatCannotBeLookedUpWithoutDescriptorsIsNotDead) {
     const ProcessIdentity self = ThisProcess();
     rlimit before{};
     ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
@@ -77,17 +68,17 @@ TEST(ProcessIdentityTest, ACommandNameWithParenthesesAndSpacesDoesNotShiftTheFie
     ASSERT_GT(::write(OpenFile("/proc/self/comm", O_WRONLY).Get(), name.data(), name.size()), 0);
 }
 
-TEST_F(TemporaryFolder, AFailedReplacementLeavesTheOldFile) {
+TEST_F(FileTest, AFailedReplacementLeavesTheOldFile) {
     const auto file = path_ / "settings";
     WriteFileAtomically(file, "old", 0640);
     EXPECT_THROW(WriteFileAtomically(path_ / "missing" / "settings", "new"), std::system_error);
     WriteFileAtomically(file, std::string(100'000, 'x'));
     EXPECT_EQ(ReadFile(file), std::string(100'000, 'x'));
-    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(path_), {}), 1) << "no temporary file stays";
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(path_.Path()), {}), 1) << "no temporary file stays";
     EXPECT_THROW(ReadFile(path_ / "nothing"), std::system_error);
 }
 
-TEST_F(TemporaryFolder, TwoMappingsOfOneFileAreTheSameMemory) {
+TEST_F(FileTest, TwoMappingsOfOneFileAreTheSameMemory) {
     SharedMapping first(path_ / "shared", 8192);
     const SharedMapping second(path_ / "shared", 4096);
     static_cast<char*>(first.Data())[4000] = 'z';
@@ -96,7 +87,7 @@ TEST_F(TemporaryFolder, TwoMappingsOfOneFileAreTheSameMemory) {
     EXPECT_THROW(SharedMapping(path_ / "no" / "folder", 4096), std::system_error);
 }
 
-TEST_F(TemporaryFolder, OneStateFolderIsOneInstallationUnderAnyName) {
+TEST_F(FileTest, OneStateFolderIsOneInstallationUnderAnyName) {
     Installation::CreateFolders(path_ / "home");
     std::filesystem::create_directory_symlink(path_ / "home", path_ / "alias");
     Installation::CreateFolders(path_ / "other");

@@ -3,7 +3,6 @@
 // A request's process as the module sees it: a caller, and a store with recordings.
 #pragma once
 
-#include <cstdlib>
 #include <filesystem>
 #include <memory>
 #include <string>
@@ -13,6 +12,7 @@
 #include "platform/recording/jpegextractor.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/store/users.h"
+#include "test/support/folder.h"
 #include "test/support/footage/footage.h"
 
 namespace lookhaven::binding {
@@ -22,8 +22,6 @@ constexpr std::int64_t kNoon = 1772366400;
 class Binding : public testing::Test {
   protected:
     Binding() {
-        std::string folder = "/tmp/lookhaven-binding.XXXXXX";
-        folder_ = mkdtemp(folder.data());
         base::Installation::CreateFolders(folder_);
         home_ = std::make_unique<base::Installation>(folder_);
         store::Store::Migrate(home_->StoreUrl());
@@ -33,10 +31,7 @@ class Binding : public testing::Test {
         }
         Call(1);
     }
-    ~Binding() override {
-        Call(0);
-        std::filesystem::remove_all(folder_);
-    }
+    ~Binding() override { Call(0); }
 
     void Call(unsigned int user) const {
         RequestContext& context = RequestContext::Current();
@@ -52,7 +47,7 @@ class Binding : public testing::Test {
     }
     std::filesystem::path Path(const char* name) const { return footage_->Mount() / name; }
 
-    std::filesystem::path folder_;
+    test::TemporaryFolder folder_;
     std::unique_ptr<base::Installation> home_;
     std::unique_ptr<test::Footage> footage_;
 };

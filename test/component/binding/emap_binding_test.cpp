@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What the platform tells the module of e-maps, of the devices on them, and of paired hosts.
-#include <cstdlib>
 #include <filesystem>
 
 #include <gmock/gmock.h>
@@ -21,6 +20,7 @@
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
+#include "test/support/folder.h"
 
 namespace lookhaven::binding {
 namespace {
@@ -50,16 +50,8 @@ class EmapBinding : public testing::Test {
         emaps_.Add({.name = "Ground floor"});
         Call(1);
     }
-    ~EmapBinding() override {
-        Call(0);
-        std::filesystem::remove_all(folder_);
-    }
+    ~EmapBinding() override { Call(0); }
 
-    static std::filesystem::path MakeFolder() {
-        std::string folder = "/tmp/lookhaven-emap.XXXXXX";
-        base::Installation::CreateFolders(mkdtemp(folder.data()));
-        return folder;
-    }
     static store::Store MakeStore(const std::string& url) {
         store::Store::Migrate(url);
         return store::Store::Open(url);
@@ -71,8 +63,8 @@ class EmapBinding : public testing::Test {
         context.SetCaller(user);
     }
 
-    const std::filesystem::path folder_ = MakeFolder();
-    const base::Installation home_{folder_};
+    const test::TemporaryFolder folder_;
+    const base::Installation home_{(base::Installation::CreateFolders(folder_), folder_)};
     store::Store records_ = MakeStore(home_.StoreUrl());
     store::Emaps emaps_{records_};
     store::Devices devices_{records_};

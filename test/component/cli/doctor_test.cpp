@@ -8,7 +8,6 @@
 #include <sys/shm.h>
 #include <sys/socket.h>
 #include <sys/un.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/installation.h"
@@ -18,6 +17,7 @@
 #include "standalone/store/connection.h"
 #include "standalone/store/events.h"
 #include "test/component/cli/program.h"
+#include "test/support/process.h"
 
 namespace lookhaven::cli {
 namespace {
@@ -144,15 +144,13 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
     EXPECT_THAT(Run("doctor").text, HasSubstr("the recorder has not run"));
     const base::Installation installation(home_);
-    const pid_t recorder = ::fork();
-    if (recorder == 0) {
+    test::WaitFor(test::InChild([&] {
         const ring::Writer writer(
             installation, {1, 0, base::Medium::kVideo},
             {.codec = "MJPEG", .extra_data = {}, .width = 64, .height = 48, .every_frame_is_key = true},
             ring::GeometryFor({.every_frame_is_key = true}));
         _exit(0);  // as if killed
-    }
-    ::waitpid(recorder, nullptr, 0);
+    }));
     const Outcome outcome = Examine();
     EXPECT_EQ(outcome.code, 1) << outcome.text;
     EXPECT_THAT(outcome.text, HasSubstr("of camera 1 was left behind"));

@@ -8,11 +8,11 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <pty.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "test/support/process.h"
 
 namespace lookhaven::cli {
 
@@ -55,8 +55,7 @@ std::vector<std::string> Words(const std::string& line) {
 }
 
 int ExitCode(pid_t child) {
-    int status = 0;
-    ::waitpid(child, &status, 0);
+    const int status = test::WaitFor(child);
     return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
 }
 
@@ -78,14 +77,8 @@ std::string ReadUntil(int descriptor, const std::string& prompt) {
 }  // namespace
 
 CliTest::CliTest() {
-    std::string pattern = testing::TempDir() + "lookhaven-cli-XXXXXX";
-    folder_ = ::mkdtemp(pattern.data());
     std::filesystem::permissions(folder_, std::filesystem::perms(0755));
     home_ = folder_ / "home";
-}
-
-CliTest::~CliTest() {
-    std::filesystem::remove_all(folder_);
 }
 
 Outcome CliTest::Run(const std::string& line, const std::string& input, bool as_nobody) {

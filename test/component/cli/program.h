@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "standalone/store/store.h"
+#include "test/support/folder.h"
 
 namespace lookhaven::cli {
 
@@ -31,7 +32,6 @@ struct Row {
 class CliTest : public testing::Test {
   protected:
     CliTest();
-    ~CliTest() override;
 
     // A line as in a shell, cut at blanks, where '…' keeps blanks. as_nobody: by a user who owns nothing.
     Outcome Run(const std::string& line, const std::string& input = "", bool as_nobody = false);
@@ -48,7 +48,7 @@ class CliTest : public testing::Test {
     static constexpr const char* kAdminPassword = "admin-s3cret";
     static constexpr const char* kViewerPassword = "viewer-s3cret";
 
-    std::filesystem::path folder_;
+    test::TemporaryFolder folder_;
     std::filesystem::path home_;
 };
 

@@ -1,30 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The shared debug-log configuration: seen by running readers, and free of processes that are gone.
-#include <cstdlib>
 #include <fstream>
 #include <numeric>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/control/debug_log_config.h"
+#include "test/support/folder.h"
+#include "test/support/process.h"
 
 namespace lookhaven::control {
 namespace {
 
 class DebugLogTest : public testing::Test {
   protected:
-    ~DebugLogTest() override { std::filesystem::remove_all(installation_.Home()); }
-
-    static base::Installation MakeHome() {
-        std::string pattern = testing::TempDir() + "lookhaven-log-XXXXXX";
-        return base::Installation(::mkdtemp(pattern.data()));
-    }
-
-    const base::Installation installation_ = MakeHome();
+    const test::TemporaryFolder home_;
+    const base::Installation installation_{home_};
 };
 
 std::vector<std::pair<int, int>> Processes(const DebugLogConfig& config) {
@@ -57,18 +51,13 @@ TEST_F(DebugLogTest, ARunningReaderSeesEveryChangeAndErrorsAtFirst) {
 }
 
 TEST_F(DebugLogTest, DeadProcessesMakeRoomAndTheLastLevelOfAProcessHolds) {
-    const pid_t child = ::fork();
-    if (child == 0) {
-        ::pause();
-        _exit(0);
-    }
+    test::KilledChild child([] {});
     DebugLogEditor editor(installation_);
-    editor.SetProcess(child, 5);
+    editor.SetProcess(child.Pid(), 5);
     editor.SetProcess(::getpid(), 4);
     editor.SetProcess(::getpid(), 6);
-    EXPECT_THAT(Processes(editor.Config()), testing::ElementsAre(std::pair(child, 5), std::pair(::getpid(), 6)));
-    ::kill(child, SIGKILL);
-    ::waitpid(child, nullptr, 0);
+    EXPECT_THAT(Processes(editor.Config()), testing::ElementsAre(std::pair(child.Pid(), 5), std::pair(::getpid(), 6)));
+    child.Kill();
     editor.SetProcess(1, 3);
     EXPECT_THAT(Processes(editor.Config()), testing::ElementsAre(std::pair(::getpid(), 6), std::pair(1, 3)));
     EXPECT_TRUE(editor.RemoveProcess(::getpid()));

@@ -4,42 +4,30 @@
 #include "standalone/control/progress_file.h"
 
 #include <array>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <vector>
 
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
+
+#include "test/support/folder.h"
+#include "test/support/process.h"
 
 namespace lookhaven::control {
 namespace {
 
 class ProgressFileTest : public testing::Test {
   protected:
-    ProgressFileTest() {
-        std::string folder = "/tmp/lookhaven-progress.XXXXXX";
-        root_ = mkdtemp(folder.data());
-        folder_ = root_ / "progress";
-    }
-    ~ProgressFileTest() override { std::filesystem::remove_all(root_); }
-
     bool Exists(int key) const { return std::filesystem::exists(folder_ / std::to_string(key)); }
     // Runs act in another process; its result.
     static bool Elsewhere(const std::function<bool()>& act) {
-        const pid_t child = fork();
-        if (child == 0) {
-            _exit(act() ? 0 : 1);
-        }
-        int status = -1;
-        waitpid(child, &status, 0);
-        return status == 0;
+        return test::WaitFor(test::InChild([&] { _exit(act() ? 0 : 1); })) == 0;
     }
 
-    std::filesystem::path root_;
-    std::filesystem::path folder_;
+    const test::TemporaryFolder root_;
+    const std::filesystem::path folder_ = root_ / "progress";
 };
 
 TEST_F(ProgressFileTest, IsSharedWithinASessionAlone) {
@@ -108,22 +96,19 @@ TEST_F(ProgressFileTest, SurvivesSweepingWhileItIsTakenOver) {
     for (int round = 0; round < 300; ++round) {
         std::array<int, 2> start{};
         ASSERT_EQ(pipe(start.data()), 0);
-        const pid_t child = fork();
-        if (child == 0) {
+        const pid_t child = test::InChild([&] {
             char byte = 0;
             const bool started = read(start[0], &byte, 1) == 1;
             auto own = ProgressFile::Own(folder_, 7, "aa");
             const bool works = started && own && own->Set(round) && own->Get() == round &&
                                ProgressFile::Open(folder_, 7, "aa")->Get() == round;
             _exit(works ? 0 : 1);
-        }
+        });
         ASSERT_EQ(write(start[1], "", 1), 1);
         for (const pid_t pid : gone) {
             ProgressFile::Sweep(folder_, 7, pid);
         }
-        int status = -1;
-        waitpid(child, &status, 0);
-        EXPECT_EQ(status, 0) << round;
+        EXPECT_EQ(test::WaitFor(child), 0) << round;
         gone = {child};
         close(start[0]);
         close(start[1]);

@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdlib>
 #include <fstream>
 #include <functional>
 
@@ -17,6 +16,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/marks.h"
+#include "test/support/folder.h"
 #include "test/support/footage/footage.h"
 
 namespace lookhaven::maintenance {
@@ -33,14 +33,6 @@ constexpr std::int64_t kNow = kNoon + 86400;
 class RetentionTest : public testing::Test {
   protected:
     RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId()); }
-    ~RetentionTest() override { fs::remove_all(folder_); }
-
-    static fs::path MakeFolder() {
-        std::string folder = "/tmp/lookhaven-retention.XXXXXX";
-        base::Installation::CreateFolders(mkdtemp(folder.data()));
-        store::Store::Migrate(base::Installation(folder).StoreUrl());
-        return folder;
-    }
 
     RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
@@ -58,8 +50,14 @@ class RetentionTest : public testing::Test {
         return ids;
     }
 
-    const fs::path folder_ = MakeFolder();
-    test::Footage footage_{base::Installation(folder_).StoreUrl(), folder_};
+    static std::string MakeStore(const fs::path& folder) {
+        base::Installation::CreateFolders(folder);
+        store::Store::Migrate(base::Installation(folder).StoreUrl());
+        return base::Installation(folder).StoreUrl();
+    }
+
+    const test::TemporaryFolder folder_;
+    test::Footage footage_{MakeStore(folder_), folder_};
 };
 
 TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {

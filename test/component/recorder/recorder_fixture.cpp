@@ -3,7 +3,6 @@
 
 #include <csignal>
 #include <cstdlib>
-#include <thread>
 
 #include <fcntl.h>
 #include <sys/prctl.h>
@@ -15,17 +14,6 @@
 #include "standalone/ring/inventory.h"
 
 namespace lookhaven::test {
-
-bool Eventually(const std::function<bool()>& condition, std::chrono::milliseconds limit) {
-    const auto end = std::chrono::steady_clock::now() + limit;
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > end) {
-            return false;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    return true;
-}
 
 Child::Child(const std::vector<std::string>& command, const std::filesystem::path& output) : pid_(::fork()) {
     if (pid_ != 0) {
@@ -57,7 +45,7 @@ void Child::Signal(int signal) const {
 
 std::optional<int> Child::Wait(std::chrono::milliseconds limit) {
     int status = 0;
-    if (!Eventually([&] { return ::waitpid(pid_, &status, WNOHANG) == pid_; }, limit)) {
+    if (!Eventually(limit, [&] { return ::waitpid(pid_, &status, WNOHANG) == pid_; })) {
         return std::nullopt;
     }
     pid_ = -1;
@@ -75,7 +63,7 @@ Viewer::Viewer(const base::Installation& installation, int camera, base::Medium 
       demand_(installation) {}
 
 bool Viewer::Attach() {
-    demand_.Touch({id_.camera, id_.stream});
+    demand_.Request({id_.camera, id_.stream});
     if (ring_ != nullptr && ring::IsRetired(ring_)) {
         Leave();
     }
@@ -96,19 +84,17 @@ void Viewer::Leave() {
 
 Seen Viewer::Next(std::chrono::milliseconds limit) {
     Seen seen;
-    const bool found = Eventually(
-        [&] {
-            const ring::Entry* entry = Attach() ? ring::ReadNext(ring_, last_sequence_, &position_) : nullptr;
-            if (entry != nullptr) {
-                last_sequence_ = entry->sequence;
-                seen = {{reinterpret_cast<const char*>(entry->Data()), static_cast<std::size_t>(entry->length)},
-                        (entry->flags & ring::kKeyFrame) != 0,
-                        entry->TimestampMicros()};
-                ring::ReadFinish(ring_, entry, &position_);
-            }
-            return entry != nullptr;
-        },
-        limit);
+    const bool found = Eventually(limit, [&] {
+        const ring::Entry* entry = Attach() ? ring::ReadNext(ring_, last_sequence_, &position_) : nullptr;
+        if (entry != nullptr) {
+            last_sequence_ = entry->sequence;
+            seen = {{reinterpret_cast<const char*>(entry->Data()), static_cast<std::size_t>(entry->length)},
+                    (entry->flags & ring::kKeyFrame) != 0,
+                    entry->TimestampMicros()};
+            ring::ReadFinish(ring_, entry, &position_);
+        }
+        return entry != nullptr;
+    });
     EXPECT_TRUE(found) << "no frame of camera " << id_.camera;
     return seen;
 }
@@ -130,8 +116,6 @@ bool Viewer::HasPicture() {
 }
 
 RecorderTest::RecorderTest() {
-    std::string pattern = (std::filesystem::temp_directory_path() / "lookhaven-recorder-XXXXXX").string();
-    home_ = ::mkdtemp(pattern.data());
     base::Installation::CreateFolders(home_);
     installation_.emplace(home_);
 }
@@ -142,7 +126,6 @@ RecorderTest::~RecorderTest() {
         std::printf("%s", Log().c_str());
     }
     ring::RemoveOrphans(*installation_);
-    std::filesystem::remove_all(home_);
 }
 
 void RecorderTest::MakeStore() const {
@@ -169,7 +152,8 @@ void RecorderTest::ChangeCamera(int id, const std::function<void(store::Camera&)
 }
 
 Child RecorderTest::StartRecorder(const std::string& no_data_limit_s) const {
-    return Child({RECORDER_PATH, "--home", home_.string(), "--no-data-limit", no_data_limit_s}, home_ / "log/recorder");
+    return Child({RECORDER_PATH, "--home", home_.Path().string(), "--no-data-limit", no_data_limit_s},
+                 home_ / "log/recorder");
 }
 
 std::string RecorderTest::Log() const {

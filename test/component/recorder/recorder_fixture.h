@@ -5,7 +5,6 @@
 
 #include <chrono>
 #include <filesystem>
-#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -17,11 +16,10 @@
 #include "standalone/media/packet.h"
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
+#include "test/support/folder.h"
+#include "test/support/wait.h"
 
 namespace lookhaven::test {
-
-// Polls the condition until it holds or the limit is over; true when it held.
-bool Eventually(const std::function<bool()>& condition, std::chrono::milliseconds limit = std::chrono::seconds(10));
 
 // A program that dies with the test.
 class Child {
@@ -90,7 +88,7 @@ class RecorderTest : public testing::Test {
     std::size_t LogLines(const std::string& text) const;
     std::size_t Segments() const;
 
-    std::filesystem::path home_;
+    TemporaryFolder home_;
     std::optional<base::Installation> installation_;
 };
 

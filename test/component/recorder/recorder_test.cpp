@@ -97,7 +97,7 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
         {page.Url(), "does not answer with Motion JPEG"},
     };
     for (const auto& [source, message] : bad) {
-        demand.Touch({AddCamera(source), 0});
+        demand.Request({AddCamera(source), 0});
     }
     const Child recorder = StartRecorder();
     for (const auto& [source, message] : bad) {
@@ -127,7 +127,7 @@ TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
         threads = recorder.Count("task");
     }
     // Viewers may be silent for a pause of ten seconds.
-    ASSERT_TRUE(Eventually([&] { return Segments() == 0; }, seconds(30)));
+    ASSERT_TRUE(Eventually(seconds(30), [&] { return Segments() == 0; }));
     EXPECT_GE(base::MonotonicMicros() - requested_us, 15'000'000);
     EXPECT_TRUE(Eventually([&] { return recorder.Count("task") == threads - 1; }));
 }
@@ -167,8 +167,8 @@ TEST_F(RecorderTest, EndsInOrder) {
     stalled.SetMood(MjpegCamera::Mood::kStall);
     Viewer live(*installation_, AddCamera("test:h264?size=160x120&audio=aac"));
     control::Demand demand(*installation_);
-    demand.Touch({AddCamera(stalled.Url()), 0});
-    demand.Touch({AddCamera("http://127.0.0.1:1/"), 0});
+    demand.Request({AddCamera(stalled.Url()), 0});
+    demand.Request({AddCamera("http://127.0.0.1:1/"), 0});
     for (const int signal : {SIGTERM, SIGINT}) {
         Child recorder = StartRecorder("60");
         ASSERT_TRUE(Eventually([&] { return live.HasPicture() && stalled.Connections() == 1; }));
@@ -207,7 +207,7 @@ TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {
     const std::optional<int> status = second.Wait();
     ASSERT_TRUE(status && WIFEXITED(*status));
     EXPECT_NE(WEXITSTATUS(*status), 0);
-    EXPECT_EQ(LogLines("another recorder runs for " + home_.string()), 1u);
+    EXPECT_EQ(LogLines("another recorder runs for " + home_.Path().string()), 1u);
     viewer.Take(3);
 }
 

@@ -212,7 +212,7 @@ TEST_P(RecordingTest, AFullDiskPausesRecordingAloneUntilThereIsRoom) {
     ASSERT_TRUE(Eventually([&] { return is_in(maintenance::RecordingState::kRecording); })) << Log();
     // The disk fills by itself now, and the old makes room for the new.
     const std::size_t before = LogLines("old events");
-    EXPECT_TRUE(Eventually([&] { return LogLines("old events") > before; }, seconds(60))) << Log();
+    EXPECT_TRUE(Eventually(seconds(60), [&] { return LogLines("old events") > before; })) << Log();
     EXPECT_TRUE(Eventually([&] { return !Open().empty(); })) << Log();
     recorder.Signal(SIGTERM);
     EXPECT_TRUE(Eventually([&] { return Open().empty(); }));

@@ -13,10 +13,7 @@
 namespace lookhaven::ring {
 namespace {
 
-const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
-const StreamFormat kH264{"H264", {1, 2, 3}, 1280, 720, false};
 const StreamId kId{3, 0, Medium::kVideo};
-const Geometry kSmall{.index_slots = 64, .arena_bytes = 1 << 16};
 
 class LifecycleTest : public RingTest {
   protected:
@@ -135,7 +132,7 @@ TEST_F(LifecycleTest, ARingThatIsTooSmallMovesToALargerOneAndALaterReaderFindsIt
     Detach(ring);
 }
 
-TEST_F(LifecycleTest, KilledReadersHoldNeitherRoomNorPlaces) {
+TEST_F(LifecycleTest, KilledReadersKeepNeitherSpaceNorSlots) {
     Writer writer = MakeWriter();
     void* ring = Attach(installation_, kId);
     Write(writer, 1);
@@ -144,18 +141,17 @@ TEST_F(LifecycleTest, KilledReadersHoldNeitherRoomNorPlaces) {
         for (Position& position : positions) {
             StartRead(ring, &position);
             if (ReadLatest(ring, kNoSequence, &position, 0) == nullptr) {
-                throw std::runtime_error("no place");
+                throw std::runtime_error("no slot");
             }
         }
     };
     // Sixteen frames fill the arena; each has a reader of its own.
+    const auto data = MakeData(4'000, 42);
     std::vector<std::unique_ptr<KilledChild>> readers;
     for (int i = 0; i < 16; ++i) {
         readers.push_back(std::make_unique<KilledChild>([&] { pin_everything(1); }));
-        const auto data = MakeData(4'000, 42);
         writer.Write({.data = data});
     }
-    const auto data = MakeData(4'000, 42);
     EXPECT_FALSE(writer.Write({.data = data})) << "living readers hold the whole arena";
     readers.clear();
     Write(writer, 100);
@@ -283,9 +279,9 @@ TEST_F(LifecycleTest, OnlyOrphansAreRemoved) {
 TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
     struct Row {
         StreamEstimate estimate;
-        std::uint64_t least_bytes;
-        std::uint64_t most_bytes;
-        std::uint32_t least_slots;
+        std::uint64_t min_bytes;
+        std::uint64_t max_bytes;
+        std::uint32_t min_slots;
     };
     for (const Row& row : {
              Row{{Medium::kVideo, true, 200'000LL * 8 * 25, 200'000, 25}, 15'000'000, 34'000'000, 75},
@@ -296,9 +292,9 @@ TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
              Row{{Medium::kVideo, true, std::int64_t{1} << 60, std::int64_t{1} << 60, 1e9}, 1 << 28, 1 << 28, 8'192},
          }) {
         const Geometry geometry = GeometryFor(row.estimate);
-        EXPECT_GE(geometry.arena_bytes, row.least_bytes);
-        EXPECT_LE(geometry.arena_bytes, row.most_bytes);
-        EXPECT_GE(geometry.index_slots, row.least_slots);
+        EXPECT_GE(geometry.arena_bytes, row.min_bytes);
+        EXPECT_LE(geometry.arena_bytes, row.max_bytes);
+        EXPECT_GE(geometry.index_slots, row.min_slots);
         EXPECT_LE(geometry.index_slots, 8'192U);
     }
 }

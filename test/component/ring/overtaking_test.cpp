@@ -2,9 +2,9 @@
 //
 // The writer overtakes a reader between its look at the index and its pin.
 //
-// Why so        That moment is a few instructions long. So the page with the reader's place in the table is made
-//               read-only in the reader's attachment: storing the pin faults, and the fault's handler lets the writer go
-//               round the ring through its own attachment before the store is done.
+// Why so        That moment is a few instructions long. So the page with the reader's slot is made read-only in the
+//               reader's attachment: storing the pin faults, and the fault's handler lets the writer overwrite the
+//               whole ring through its own attachment before the store is done.
 #include <csignal>
 #include <functional>
 
@@ -48,9 +48,9 @@ TEST_F(RingTest, AReaderOvertakenWhileItPinsGetsAnEntryThatIsStillThere) {
         StartRead(ring, &position);
         write(2);
 
-        const auto place = reinterpret_cast<std::uintptr_t>(&View(ring).Readers()[0]);
+        const auto slot = reinterpret_cast<std::uintptr_t>(&View(ring).Readers()[0]);
         const auto size = static_cast<std::uintptr_t>(::sysconf(_SC_PAGESIZE));
-        void* page = reinterpret_cast<void*>(place / size * size);
+        void* page = reinterpret_cast<void*>(slot / size * size);
         ASSERT_EQ(position.reader, 0);
         struct sigaction before {};
         struct sigaction fault {};

@@ -17,9 +17,7 @@
 namespace lookhaven::ring {
 namespace {
 
-const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
 const StreamId kId{3, 0, Medium::kVideo};
-const Geometry kSmall{.index_slots = 64, .arena_bytes = 1 << 16};
 
 using SweepTest = RingTest;
 

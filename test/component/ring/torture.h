@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A reader that trusts nothing: it checks each entry when it gets it and again before it gives it back.
+// A reader that checks each entry when it gets it and again before it releases it, and a writer to go with it.
 #pragma once
 
 #include <atomic>
@@ -102,17 +102,17 @@ class TortureWriter {
           random_(seed),
           findings_(findings) {}
 
-    void WriteOnce(std::size_t most_bytes) {
+    void WriteOnce(std::size_t max_bytes) {
         const std::uint64_t seed = random_();
-        const std::span<unsigned char> data(buffer_, 8 + seed % (most_bytes - 8));
+        const std::span<unsigned char> data(buffer_, 8 + seed % (max_bytes - 8));
         Fill(data, seed);
         const bool is_written = writer_.Write(
             {.data = data, .is_key = written_++ % 10 == 0, .timestamp_micros = static_cast<std::int64_t>(seed)});
         ++(is_written ? findings_.written : findings_.dropped);
     }
 
-    // Goes round the ring at full speed, then lets the readers catch up for a moment: a writer that never rests leaves
-    // them no processor on a busy machine.
+    // Writes at full speed, then pauses for the readers to catch up: a writer that never pauses leaves them no
+    // processor on a busy machine.
     void WriteBurst() {
         for (std::uint64_t left = 1 + random_() % 256; left > 0; --left) {
             WriteOnce(random_() % 4 == 0 ? 3'000 : 500);

@@ -17,9 +17,9 @@ constexpr std::uint64_t kFrames = 100'000;  // a race detector sees nothing betw
 #else
 constexpr std::uint64_t kFrames = 1'000'000;
 #endif
-constexpr std::int64_t kLongestRunMicros = 200'000'000;  // many times what it takes on idle cores
-constexpr std::uint64_t kMostFramesBetweenKills = 4'000;
-constexpr int kFewestKills = 100;
+constexpr std::int64_t kMaxRunMicros = 200'000'000;  // many times what it takes on idle cores
+constexpr std::uint64_t kMaxFramesBetweenKills = 4'000;
+constexpr int kMinKills = 100;
 constexpr std::size_t kReaders = 4;
 const StreamId kId{1, 0, Medium::kVideo};
 
@@ -71,13 +71,13 @@ TEST_F(TortureTest, ProcessesKilledAtAnyInstructionTearNoFrameAndLeaveNothing) {
     for (std::size_t i = 0; i < processes.size(); ++i) {
         start(i);
     }
-    const std::int64_t end = base::MonotonicMicros() + kLongestRunMicros;
+    const std::int64_t end = base::MonotonicMicros() + kMaxRunMicros;
     int kills = 0;
     int failed_children = 0;
-    // Kills come after so many frames, not so much time: where the machine is busy, a process still gets to work. Who
-    // sleeps between two looks sees more frames go by than were asked for: kills are counted beside frames.
-    while ((findings.verified < kFrames || kills < kFewestKills) && base::MonotonicMicros() < end) {
-        const std::uint64_t next_kill = findings.verified + random() % kMostFramesBetweenKills;
+    // The next kill comes after a number of frames, not after a time, so that processes get to work on a busy machine
+    // too. More frames than that may pass during a sleep, so kills are counted as well.
+    while ((findings.verified < kFrames || kills < kMinKills) && base::MonotonicMicros() < end) {
+        const std::uint64_t next_kill = findings.verified + random() % kMaxFramesBetweenKills;
         while (findings.verified < next_kill && base::MonotonicMicros() < end) {
             std::this_thread::sleep_for(std::chrono::microseconds(random() % 1'000));
         }
@@ -90,7 +90,7 @@ TEST_F(TortureTest, ProcessesKilledAtAnyInstructionTearNoFrameAndLeaveNothing) {
         start(victim);
     }
     for (const pid_t process : processes) {
-        KillAndWait(process);
+        test::KillAndWait(process);
     }
     std::cout << findings.written << " frames written, " << findings.dropped << " dropped, " << findings.verified
               << " verified, " << kills << " kills\n";
@@ -98,8 +98,8 @@ TEST_F(TortureTest, ProcessesKilledAtAnyInstructionTearNoFrameAndLeaveNothing) {
     EXPECT_EQ(findings.out_of_order, 0U);
     EXPECT_EQ(failed_children, 0);
     EXPECT_GE(findings.verified, kFrames);
-    EXPECT_GE(kills, kFewestKills);
-    EXPECT_EQ(findings.dropped, 0U) << "killed readers keep room";
+    EXPECT_GE(kills, kMinKills);
+    EXPECT_EQ(findings.dropped, 0U) << "killed readers keep space";
     RemoveOrphans(installation_);
     EXPECT_TRUE(ListSegments(installation_).empty());
     ::munmap(memory, sizeof(Findings));

@@ -151,7 +151,7 @@ TEST_P(SqliteTest, WhatIsNoStoreIsAnErrorAndStaysAsItIs) {
     const std::string text(8192, 'x');
     std::ofstream(folder_ / "lookhaven.db") << text;
     std::filesystem::create_directory(folder_ / "folder");
-    const std::string folder = folder_.string();
+    const std::string folder = folder_.Path().string();
     for (const std::string& url :
          {url_, "sqlite:" + folder + "/folder", "sqlite:" + folder + "/no/such", "sqlite:" + folder + "/a\"b",
           std::string("sqlite:"), std::string(""), std::string("mysql://host/db"),

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "test/component/store/store_fixture.h"
 
-#include <cstdlib>
 #include <exception>
 #include <latch>
 
@@ -10,18 +9,12 @@
 namespace lookhaven::store {
 
 EmptyStore::EmptyStore() {
-    std::string pattern = testing::TempDir() + "lookhaven store-XXXXXX";  // a path with a space
-    folder_ = ::mkdtemp(pattern.data());
     if (GetParam() == Engine::kPostgresql) {
         static test::TemporaryPostgres server;
         url_ = server.NewDatabase();
         return;
     }
     url_ = "sqlite:" + (folder_ / "lookhaven.db").string();
-}
-
-EmptyStore::~EmptyStore() {
-    std::filesystem::remove_all(folder_);
 }
 
 std::string EmptyStore::Ask(const std::string& query) {

@@ -3,7 +3,6 @@
 // Gives each test an empty store of its own, on either engine.
 #pragma once
 
-#include <filesystem>
 #include <functional>
 #include <string>
 #include <thread>
@@ -14,19 +13,19 @@
 
 #include "standalone/store/connection.h"
 #include "standalone/store/store.h"
+#include "test/support/folder.h"
 
 namespace lookhaven::store {
 
 class EmptyStore : public testing::TestWithParam<Engine> {
   protected:
     EmptyStore();
-    ~EmptyStore() override;
 
     // Looks or reaches behind the records' interface.
     std::string Ask(const std::string& query);
     void Force(const std::string& statement);
 
-    std::filesystem::path folder_;
+    test::TemporaryFolder folder_{"lookhaven store"};  // a path with a space
     std::string url_;
 };
 

@@ -9,29 +9,13 @@
 #include <string>
 #include <vector>
 
-#include <stdlib.h>
-
 #include "standalone/archive/frame_index.h"
 #include "standalone/archive/layout.h"
+#include "test/support/folder.h"
 
 namespace lookhaven::test {
 
-class ArchiveFolder {
-  public:
-    ArchiveFolder() {
-        std::string pattern = "/tmp/lookhaven-archive-XXXXXX";
-        path_ = ::mkdtemp(pattern.data());
-    }
-    ArchiveFolder(const ArchiveFolder&) = delete;
-    ArchiveFolder& operator=(const ArchiveFolder&) = delete;
-    ~ArchiveFolder() { std::filesystem::remove_all(path_); }
-
-    std::filesystem::path operator/(const std::string& name) const { return path_ / name; }
-    const std::filesystem::path& Path() const { return path_; }
-
-  private:
-    std::filesystem::path path_;
-};
+using ArchiveFolder = TemporaryFolder;
 
 inline std::string Contents(const std::filesystem::path& path) {
     std::ifstream file(path, std::ios::binary);

@@ -6,11 +6,9 @@
 #include <cstdlib>
 #include <fstream>
 #include <sstream>
-#include <thread>
 
 #include <sys/socket.h>
 #include <sys/un.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
@@ -18,6 +16,7 @@
 #include "standalone/base/process.h"
 #include "standalone/store/users.h"
 #include "test/support/host/scgi_bytes.h"
+#include "test/support/process.h"
 
 namespace lookhaven::host {
 
@@ -68,19 +67,7 @@ Json::Value Answer::Json() const {
     return value;
 }
 
-bool Eventually(std::chrono::milliseconds time, const std::function<bool()>& condition) {
-    for (const auto end = std::chrono::steady_clock::now() + time; !condition();) {
-        if (std::chrono::steady_clock::now() > end) {
-            return false;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    return true;
-}
-
 HostUnderTest::HostUnderTest(const std::vector<std::string>& options, bool hand_over_socket) {
-    std::string folder = "/tmp/lookhaven-host.XXXXXX";
-    folder_ = mkdtemp(folder.data());
     base::Installation::CreateFolders(folder_);
     home_ = std::make_unique<base::Installation>(folder_);
     store::Store::Migrate(home_->StoreUrl());
@@ -100,7 +87,6 @@ HostUnderTest::~HostUnderTest() {
     if (pid_ > 0) {
         End(SIGKILL);
     }
-    std::filesystem::remove_all(folder_);
 }
 
 store::NewSession HostUnderTest::LogIn(const std::string& account) const {
@@ -194,11 +180,8 @@ std::size_t HostUnderTest::Descriptors() const {
 }
 
 int HostUnderTest::End(int signal) {
-    int status = -1;
     kill(pid_, signal);
-    waitpid(pid_, &status, 0);
-    pid_ = 0;
-    return status;
+    return test::WaitFor(std::exchange(pid_, 0));
 }
 
 }  // namespace lookhaven::host

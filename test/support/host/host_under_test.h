@@ -3,9 +3,6 @@
 // Runs the real host program on a state folder of its own, and asks it as a web server would.
 #pragma once
 
-#include <chrono>
-#include <filesystem>
-#include <functional>
 #include <map>
 #include <string>
 #include <vector>
@@ -16,6 +13,8 @@
 #include "standalone/base/file_descriptor.h"
 #include "standalone/base/installation.h"
 #include "standalone/store/sessions.h"
+#include "test/support/folder.h"
+#include "test/support/wait.h"
 
 namespace lookhaven::host {
 
@@ -27,8 +26,7 @@ struct Answer {
     Json::Value Json() const;
 };
 
-// Polls until the condition holds; false when it does not within the time.
-bool Eventually(std::chrono::milliseconds time, const std::function<bool()>& condition);
+using test::Eventually;
 
 class HostUnderTest {
   public:
@@ -62,7 +60,7 @@ class HostUnderTest {
     int End(int signal);
 
   private:
-    std::filesystem::path folder_;
+    test::TemporaryFolder folder_;
     std::unique_ptr<base::Installation> home_;
     pid_t pid_ = 0;
 };

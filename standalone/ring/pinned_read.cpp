@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/ring/reading.h"
+#include "standalone/ring/pinned_read.h"
 
 #include <mutex>
 #include <vector>
@@ -8,57 +8,57 @@ namespace lookhaven::ring {
 
 namespace {
 
-// Entries overtaken by the writer between the look at the newest count and the pin are tried again; a writer that
-// overtakes a reader that often is not a camera.
-constexpr int kPinTries = 16;
+// An entry that the writer overwrites before it is pinned is given up for a newer one; a writer that does so this often
+// is no camera.
+constexpr int kMaxPinTries = 16;
 
-// What this process has pinned without a position.
-struct LoosePin {
+// An entry that this process has pinned without a position.
+struct ProcessPin {
     void* ring;
     std::uint32_t generation;
     const Entry* entry;
     int reader;
 };
 
-std::mutex loose_pins_mutex;
-std::vector<LoosePin> loose_pins;
+std::mutex process_pins_mutex;
+std::vector<ProcessPin> process_pins;
 
 }  // namespace
 
-const Entry* Reading::Pin(std::uint64_t count) {
+const Entry* PinnedRead::Pin(std::uint64_t count) {
     const IndexSlot& index = view_.Slot(count);
     if (!IsLive(count)) {
         return nullptr;
     }
-    const std::uint64_t place = index.place.load();
-    slot_->pin.store(place);
+    const std::uint64_t region = index.region.load();
+    slot_->pin.store(region);
     if (index.count.load() != count) {
         slot_->pin.store(0);
         return nullptr;
     }
-    const Entry* entry = view_.EntryAt(Place::FromWord(place));
+    const Entry* entry = view_.EntryAt(Region::FromWord(region));
     if (entry == nullptr) {
         slot_->pin.store(0);
         return nullptr;
     }
-    Keep(entry, count);
+    HandOver(entry, count);
     return entry;
 }
 
-void Reading::Keep(const Entry* entry, std::uint64_t count) {
+void PinnedRead::HandOver(const Entry* entry, std::uint64_t count) {
     if (position_ != nullptr) {
         position_->count = count;
         position_->pinned = static_cast<std::int32_t>(count % Head().index_slots);
         return;
     }
-    const std::lock_guard lock(loose_pins_mutex);
-    loose_pins.push_back({ring_, Head().generation, entry, reader_});
-    kept_ = true;
+    const std::lock_guard lock(process_pins_mutex);
+    process_pins.push_back({ring_, Head().generation, entry, reader_});
+    handed_over_ = true;
 }
 
-const Entry* Reading::PinNamedBy(const std::atomic<std::uint64_t>& word) {
+const Entry* PinnedRead::PinCurrent(const std::atomic<std::uint64_t>& word) {
     std::uint64_t count = word.load();
-    for (int tries = 0; tries < kPinTries && count != 0; ++tries) {
+    for (int tries = 0; tries < kMaxPinTries && count != 0; ++tries) {
         if (const Entry* entry = Pin(count)) {
             return entry;
         }
@@ -71,7 +71,7 @@ const Entry* Reading::PinNamedBy(const std::atomic<std::uint64_t>& word) {
     return nullptr;
 }
 
-std::uint64_t Reading::LastCount(int last_sequence) const {
+std::uint64_t PinnedRead::LastCount(int last_sequence) const {
     if (last_sequence < 0 || last_sequence > kLastSequence) {
         return 0;
     }
@@ -90,13 +90,13 @@ std::uint64_t Reading::LastCount(int last_sequence) const {
     return back < newest ? newest - back : 0;
 }
 
-void ReleaseLoosePins(void* ring, const Entry* only_entry) {
-    const std::lock_guard lock(loose_pins_mutex);
-    std::erase_if(loose_pins, [&](const LoosePin& pin) {
+void ReleaseProcessPins(void* ring, const Entry* only_entry) {
+    const std::lock_guard lock(process_pins_mutex);
+    std::erase_if(process_pins, [&](const ProcessPin& pin) {
         if (pin.ring != ring || (only_entry != nullptr && pin.entry != only_entry)) {
             return false;
         }
-        // A ring attached later at the same address has nothing to do with the pin.
+        // The pin may be of another ring, attached earlier at the same address.
         if (pin.generation == View(ring).Head().generation) {
             ReaderTable(View(ring)).Release(pin.reader);
         }
@@ -104,9 +104,9 @@ void ReleaseLoosePins(void* ring, const Entry* only_entry) {
     });
 }
 
-void ForgetLoosePins(const void* ring) {
-    const std::lock_guard lock(loose_pins_mutex);
-    std::erase_if(loose_pins, [ring](const LoosePin& pin) { return pin.ring == ring; });
+void ForgetProcessPins(const void* ring) {
+    const std::lock_guard lock(process_pins_mutex);
+    std::erase_if(process_pins, [ring](const ProcessPin& pin) { return pin.ring == ring; });
 }
 
 }  // namespace lookhaven::ring
