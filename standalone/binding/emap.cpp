@@ -5,7 +5,7 @@
 
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/store/emap_pictures.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/text.h"
 
@@ -86,7 +86,7 @@ bool Emap::GetSmallItemSize() const {
 std::string LoadEmapImgBase64String(const std::string& imageName, int& length) {
     const std::string text = OrFailure("LoadEmapImgBase64String", std::string(), [&] {
         RequestContext& context = RequestContext::Current();
-        return store::ToBase64(store::EmapPictures(context.Records(), context.Home().Home()).Read(imageName));
+        return store::ToBase64(lookhaven::emap::Pictures(context.Records(), context.Home().Home()).Read(imageName));
     });
     length = static_cast<int>(text.size());
     return text;

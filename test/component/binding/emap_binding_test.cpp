@@ -16,8 +16,8 @@
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/store/devices.h"
-#include "standalone/store/emap_pictures.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/emap/pictures.h"
+#include "standalone/binding/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
@@ -111,7 +111,7 @@ TEST_F(EmapBinding, AMapLoadsForThoseWhoMaySeeItWithItsItemsInOrder) {
 }
 
 TEST_F(EmapBinding, APictureIsItsFileInBase64OrNothing) {
-    store::EmapPictures(records_, folder_).Put(1, "<svg/>");
+    emap::Pictures(records_, folder_).Put(1, "<svg/>");
     Emap emap;
     ASSERT_EQ(emap.Load(1), 0);
     int length = -1;
@@ -209,7 +209,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     const std::string timestamp = cookie.substr(0, cookie.find('-'));
     EXPECT_EQ(cookie.find(kSecret), std::string::npos);
     const std::string token = cookie.substr(timestamp.size() + 1);
-    EXPECT_EQ(token, store::MakePairToken(kSecret, timestamp));
+    EXPECT_EQ(token, MakePairToken(kSecret, timestamp));
     EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "what is shown to another host opens nothing here";
     for (const unsigned int caller : {2U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
         Call(caller);
@@ -218,10 +218,10 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
     EXPECT_FALSE(
-        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
+        SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'e'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
     EXPECT_TRUE(
-        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+        SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'd'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
 }
 

@@ -1,13 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps, their pictures and devices, and the hosts that this one is paired with.
+// E-maps, the devices on them, and the hosts that this one is paired with.
 #include "standalone/store/emaps.h"
 
-#include <fstream>
-
 #include "standalone/store/devices.h"
-#include "standalone/store/emap_pictures.h"
-#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
@@ -37,7 +33,6 @@ class EmapTest : public StoreTest {
     Emaps emaps_{store_};
     Devices devices_{store_};
     RecordingServers servers_{store_};
-    EmapPictures pictures_{store_, folder_};
 };
 
 TEST_P(EmapTest, ItemsComeBackAsTheyWerePutAndOnlyOnTopOfWhatWasRead) {
@@ -120,62 +115,6 @@ TEST_P(EmapTest, TwoEditorsCannotUndoEachOther) {
     EXPECT_THAT(emaps_.Items(map), SizeIs(saved.load())) << "each that was told \"saved\" is there";
 }
 
-TEST_P(EmapTest, PicturesAreKnownByWhatTheyHold) {
-    const struct {
-        std::string bytes;
-        std::string_view type;
-    } rows[] = {
-        {"\x89PNG\r\n\x1a\n....", "png"},
-        {"\xff\xd8\xff\xe0..", "jpg"},
-        {std::string("RIFF\0\0\0\0WEBPVP8 ", 16), "webp"},
-        {std::string("RIFF\0\0\0\0WAVEfmt ", 16), ""},
-        {"<svg/>", "svg"},
-        {"\xef\xbb\xbf<?xml version=\"1.0\"?>\n<!-- a -->\n<!DOCTYPE svg PUBLIC \"a\" \"b\">\n<svg width=\"1\">",
-         "svg"},
-        {"<!DOCTYPE svg [<!ENTITY a \"b\">]><svg>", ""},
-        {"<svgx>", ""},
-        {"<svg", ""},
-        {"<!-- <svg>", ""},
-        {"<?xml", ""},
-        {"<html><svg>", ""},
-        {"GIF89a", ""},
-        {"", ""}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(PictureType(row.bytes), row.type) << row.bytes;
-    }
-}
-
-TEST_P(EmapTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
-    const int map = AddMap("Ground floor");
-    pictures_.Put(map, "<svg/>");
-    const std::string first = emaps_.Find(map)->image;
-    EXPECT_EQ(pictures_.Read(first), "<svg/>");
-    EXPECT_THROW(pictures_.Put(map, "MZ"), InvalidRecord);
-    EXPECT_THROW(pictures_.Put(map, "<svg>" + std::string(kMaxEmapPictureBytes, ' ')), InvalidRecord);
-    EXPECT_THROW(pictures_.Put(99, "<svg/>"), NotFound);
-    EXPECT_EQ(emaps_.Find(map)->image, first);
-    namespace fs = std::filesystem;
-    const auto make_old = [&] {
-        fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
-    };
-    make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
-    EXPECT_NE(emaps_.Find(map)->image, first);
-    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "whoever has just been told of it";
-    make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
-    EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
-
-    std::ofstream(folder_ / "secret.svg") << "<svg/>";
-    const std::string ours = "1-0123456789abcdef.svg";
-    fs::create_symlink(folder_ / "secret.svg", folder_ / "emaps" / ours);
-    for (const std::string& name :
-         {ours, std::string("../secret.svg"), std::string("1-0123456789abcdef.png"), std::string("."), std::string(),
-          "/" + ours, std::string("1-0123456789abcde/.svg"), ours + std::string("\0x", 2), first}) {
-        EXPECT_THROW(pictures_.Read(name), std::system_error) << name;
-    }
-}
-
 TEST_P(EmapTest, DevicesKeepTheirPortsAndTheIdsTheyHaveElsewhere) {
     const int camera = AddCamera();
     const int server = AddServer();
@@ -252,13 +191,13 @@ TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
-    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is asked has nothing to ask here";
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "one that is asked has nothing to ask here";
     RecordingServer asker{.name = "Asks only"};
     asker.id = servers_.Add(asker, kSecret);
-    EXPECT_THAT(servers_.AskersSecrets(), ElementsAre(kSecret));
+    EXPECT_THAT(servers_.InboundPeerSecrets(), ElementsAre(kSecret));
     asker.enabled = false;
     servers_.Update(asker);
-    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is switched off gets no answer";
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "one that is switched off gets no answer";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;
     servers_.Update(changed, std::string(64, 'b'));
@@ -289,38 +228,6 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(EmapTest);
-
-TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
-    constexpr std::int64_t kNow = 1'800'000'000;
-    const std::string now = "1800000000";
-    const std::string token = MakePairToken(kSecret, now);
-    std::string flipped = token;
-    flipped.back() = flipped.back() == '0' ? '1' : '0';
-    const struct {
-        std::string token, timestamp, secret;
-        std::int64_t at;
-        bool matches;
-    } rows[] = {{token, now, kSecret, kNow, true},
-                {token, now, kSecret, kNow + 300, true},
-                {token, now, kSecret, kNow - 300, true},
-                {token, now, kSecret, kNow + 301, false},
-                {token, now, kSecret, kNow - 301, false},
-                {token, "1800000001", kSecret, kNow, false},
-                {token, now, std::string(64, 'b'), kNow, false},
-                {flipped, now, kSecret, kNow, false},
-                {token.substr(1), now, kSecret, kNow, false},
-                {token, now, "", kNow, false},
-                {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
-                {MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
-                {MakePairToken(kSecret, ""), "", kSecret, 0, false}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
-            << row.timestamp << " at " << row.at;
-    }
-    EXPECT_THROW(MakePairToken("", now), std::invalid_argument);
-}
 
 }  // namespace
 }  // namespace lookhaven::store
