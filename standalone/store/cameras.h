@@ -21,6 +21,8 @@ struct CameraProfile {
     int width = 0;       // as asked for; 0 = as the source has it
     int height = 0;
     int fps = 0;
+
+    friend bool operator==(const CameraProfile&, const CameraProfile&) = default;
 };
 
 struct Camera {
@@ -35,6 +37,8 @@ struct Camera {
 
     // Null when the camera lacks that profile.
     const CameraProfile* FindProfile(int number) const;
+
+    friend bool operator==(const Camera&, const Camera&) = default;
 };
 
 // The recorder's login at the camera.

@@ -40,6 +40,8 @@ struct Event {
     std::string path;       // relative to the mount
     bool archived = false;  // retention leaves it alone
     bool demo = false;      // demo data: there is no file
+
+    friend bool operator==(const Event&, const Event&) = default;
 };
 
 // Which events to read: by default none, since no camera is named.

@@ -14,7 +14,7 @@ namespace {
 constexpr int kAttempts = 5;
 constexpr std::int64_t kWindowS = 60;
 
-// One key of fixed form out of two texts of any form and length; names are told apart without regard to case.
+// One key of fixed form out of two texts of any form and length; names are compared without regard to case.
 std::string Origin(std::string_view account, std::string_view address) {
     std::string text(account);
     std::transform(text.begin(), text.end(), text.begin(),
@@ -24,7 +24,7 @@ std::string Origin(std::string_view account, std::string_view address) {
 
 }  // namespace
 
-// The window begins with the first attempt, and once more with the fifth: from there on it is the bar.
+// The window begins with the first attempt, and once more with the fifth: from there on attempts are refused.
 int LoginThrottle::Enter(std::string_view account, std::string_view address, std::int64_t now_s) {
     return connection_.Write([&](soci::session& sql) {
         Execute(sql, "delete from login_attempts where since <= :over or since > :now", now_s - kWindowS, now_s);

@@ -42,6 +42,8 @@ struct Mark {
     int mount_id = 0;  // these two once it is saved
     std::string path;  // of the span file, relative to the mount
     bool demo = false;
+
+    friend bool operator==(const Mark&, const Mark&) = default;
 };
 
 // Which marks to read: by default none, since no camera is named.

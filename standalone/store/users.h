@@ -42,7 +42,7 @@ struct VerifiedUser : User {
 
 // Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
 //                   So does one of a group that is denied.
-//               (2) Names are told apart without regard to case, and "Lookhaven" is nobody's name.
+//               (2) Names are compared without regard to case; no account is called "Lookhaven".
 class Users {
   public:
     // The store must outlive this object.

@@ -14,10 +14,10 @@
 #include "platform/emap/device.h"
 #include "platform/emap/emap.h"
 #include "platform/privilege/privprofile.h"
-#include "standalone/binding/request_context.h"
-#include "standalone/store/devices.h"
-#include "standalone/emap/pictures.h"
 #include "standalone/binding/pair_token.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/emap/pictures.h"
+#include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
@@ -217,12 +217,42 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     }
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
-    EXPECT_FALSE(
-        SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'e'), timestamp), timestamp));
+    EXPECT_FALSE(SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'e'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
-    EXPECT_TRUE(
-        SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+    EXPECT_TRUE(SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'd'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
+}
+
+TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
+    constexpr std::int64_t kNow = 1'800'000'000;
+    const std::string now = "1800000000";
+    const std::string token = MakePairToken(kSecret, now);
+    std::string flipped = token;
+    flipped.back() = flipped.back() == '0' ? '1' : '0';
+    const struct {
+        std::string token, timestamp, secret;
+        std::int64_t at;
+        bool matches;
+    } rows[] = {{token, now, kSecret, kNow, true},
+                {token, now, kSecret, kNow + 300, true},
+                {token, now, kSecret, kNow - 300, true},
+                {token, now, kSecret, kNow + 301, false},
+                {token, now, kSecret, kNow - 301, false},
+                {token, "1800000001", kSecret, kNow, false},
+                {token, now, std::string(64, 'b'), kNow, false},
+                {flipped, now, kSecret, kNow, false},
+                {token.substr(1), now, kSecret, kNow, false},
+                {token, now, "", kNow, false},
+                {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
+                {MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
+                {MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
+                {MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
+                {MakePairToken(kSecret, ""), "", kSecret, 0, false}};
+    for (const auto& row : rows) {
+        EXPECT_EQ(PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
+            << row.timestamp << " at " << row.at;
+    }
+    EXPECT_THROW(MakePairToken("", now), std::invalid_argument);
 }
 
 }  // namespace

@@ -22,7 +22,6 @@ const std::string kCertificate = "-----BEGIN CERTIFICATE-----\nAA==\n-----END CE
 
 class EmapTest : public StoreTest {
   protected:
-    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
     int AddMap(const std::string& name) { return emaps_.Add({.name = name}); }
     int AddServer(const std::string& name = "Annex") {
         return servers_.Add({.name = name, .address = "192.0.2.7", .port = 8443, .certificate = kCertificate}, kSecret);
@@ -66,11 +65,7 @@ TEST_P(EmapTest, WhatBreaksARuleChangesNothing) {
     AddCamera();
     const EmapItem good{.device_id = 1};
     Replace(map, {good});
-    const auto with = [&](auto member, auto value) {
-        EmapItem item = good;
-        item.*member = value;
-        return item;
-    };
+    const auto with = [&](auto member, auto value) { return With(good, member, value); };
     for (const EmapItem& item :
          {with(&EmapItem::type, EmapItemType(5)), with(&EmapItem::type, EmapItemType(-1)),
           with(&EmapItem::name, std::string(256, 'n')), with(&EmapItem::name, std::string("a\nb")),
@@ -133,16 +128,19 @@ TEST_P(EmapTest, DevicesKeepTheirPortsAndTheIdsTheyHaveElsewhere) {
     devices_.Update(module);
     EXPECT_EQ(devices_.Find(EmapItemType::kIoModule, module.id)->server_id, server) << "a device changes no owner";
     EXPECT_THAT(devices_.Find(EmapItemType::kIoModule, module.id)->ports, SizeIs(1));
-    const auto refused = [&](Device device) { devices_.Add(device); };
-    EXPECT_THROW(refused({.kind = EmapItemType::kCamera, .name = "a"}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = ""}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .ports = {{0, {}}}}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .server_id = server, .id_on_server = 1}),
-                 InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kIoModule, .name = "a", .ports = {{64, {}}}}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .server_id = 99, .id_on_server = 1}), NotFound);
-    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .camera_id = 99}), NotFound);
-
+    for (const Device& device : std::initializer_list<Device>{
+             {.kind = EmapItemType::kCamera, .name = "a"},
+             {.kind = EmapItemType::kDoor, .name = ""},
+             {.kind = EmapItemType::kDoor, .name = "a", .ports = {{0, {}}}},
+             {.kind = EmapItemType::kDoor, .name = "a", .server_id = server, .id_on_server = 1},
+             {.kind = EmapItemType::kIoModule, .name = "a", .ports = {{64, {}}}}}) {
+        EXPECT_THROW(devices_.Add(device), InvalidRecord) << static_cast<int>(device.kind);
+    }
+    for (const Device& device :
+         std::initializer_list<Device>{{.kind = EmapItemType::kPos, .name = "a", .server_id = 99, .id_on_server = 1},
+                                       {.kind = EmapItemType::kPos, .name = "a", .camera_id = 99}}) {
+        EXPECT_THROW(devices_.Add(device), NotFound) << device.server_id;
+    }
     devices_.SetCameraPorts(remote, {2, 1});
     EXPECT_EQ(devices_.CameraPorts().at(remote).inputs, 2);
     EXPECT_THROW(devices_.SetCameraPorts(99, {1, 1}), NotFound);
@@ -191,13 +189,13 @@ TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
-    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "one that is asked has nothing to ask here";
-    RecordingServer asker{.name = "Asks only"};
-    asker.id = servers_.Add(asker, kSecret);
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "a server that this host connects to";
+    RecordingServer peer{.name = "Connects to this host"};
+    peer.id = servers_.Add(peer, kSecret);
     EXPECT_THAT(servers_.InboundPeerSecrets(), ElementsAre(kSecret));
-    asker.enabled = false;
-    servers_.Update(asker);
-    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "one that is switched off gets no answer";
+    peer.enabled = false;
+    servers_.Update(peer);
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "disabled";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;
     servers_.Update(changed, std::string(64, 'b'));
@@ -209,17 +207,16 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     for (const std::string& secret : {std::string(), std::string(63, 'a'), std::string(64, 'g')}) {
         EXPECT_THROW(servers_.Add(good, secret), InvalidRecord) << secret;
     }
-    for (const char* address : {"a b", "a;b", "a/b", "a}b", "a\n", "-a", "a$b"}) {
-        EXPECT_THROW(servers_.Add({.name = "B", .address = address, .port = 1, .certificate = kCertificate}, kSecret),
-                     InvalidRecord)
-            << address;
+    const auto with = [&](auto member, auto value) { return With(good, member, value); };
+    constexpr auto kAddress = &RecordingServer::address;
+    constexpr auto kPort = &RecordingServer::port;
+    constexpr auto kPem = &RecordingServer::certificate;
+    for (const RecordingServer& bad :
+         {with(kAddress, "a b"), with(kAddress, "a;b"), with(kAddress, "a/b"), with(kAddress, "a}b"),
+          with(kAddress, "a\n"), with(kAddress, "-a"), with(kAddress, "a$b"), with(kPort, 65536), with(kPort, 0),
+          with(kPem, "x"), with(kPem, "")}) {
+        EXPECT_THROW(servers_.Add(bad, kSecret), InvalidRecord) << bad.address << bad.port << bad.certificate;
     }
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 65536, .certificate = kCertificate}, kSecret),
-                 InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 0, .certificate = kCertificate}, kSecret),
-                 InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1, .certificate = "x"}, kSecret), InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1}, kSecret), InvalidRecord) << "in the clear";
     EXPECT_THROW(AddServer(), AlreadyExists);
     const int id = servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "Old"});
     EXPECT_EQ(servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "New"}), id);
