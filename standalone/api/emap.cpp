@@ -9,7 +9,7 @@
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/devices.h"
-#include "standalone/store/emap_json.h"
+#include "standalone/emap/item_json.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/servers.h"
 
@@ -37,7 +37,7 @@ std::string Items(const Call& call) {
     data["revision"] = emap.revision;
     data["hideItemName"] = emap.hide_names;
     data["smallItemSize"] = emap.small_items;
-    data["items"] = store::ToJson(store::Emaps(call.Records()).Items(emap.id));
+    data["items"] = emap::ToJson(store::Emaps(call.Records()).Items(emap.id));
     return SuccessAnswer(data);
 }
 
@@ -52,7 +52,7 @@ std::string SaveItems(const Call& call) {
     }
     Json::Value data;
     data["revision"] =
-        store::Emaps(call.Records()).ReplaceItems(emap, store::EmapItemsFromJson(call.Parameter("items")));
+        store::Emaps(call.Records()).ReplaceItems(emap, emap::ItemsFromJson(call.Parameter("items")));
     return SuccessAnswer(data);
 }
 

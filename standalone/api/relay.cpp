@@ -14,7 +14,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file_descriptor.h"
 #include "standalone/binding/rights.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/binding/pair_token.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::api {
@@ -67,7 +67,7 @@ std::string Play(const Call& call) {
     const std::string timestamp = std::to_string(base::WallMillis() / 1000);
     std::string query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
                         Passed(call, "snapshot") + Passed(call, "profileType") +
-                        "&cookie=" + store::MakePairToken(secret, timestamp);
+                        "&cookie=" + binding::MakePairToken(secret, timestamp);
     if (!binding::MayUse(camera->id, store::CameraAccess::kAudio)) {
         query += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
     }

@@ -6,7 +6,7 @@
 #include "standalone/base/text.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/store/emap_pictures.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/store/emaps.h"
 
 namespace store = lookhaven::store;
@@ -86,7 +86,8 @@ bool Emap::GetSmallItemSize() const {
 std::string LoadEmapImgBase64String(const std::string& imageName, int& length) {
     const std::string text = OrFailure("LoadEmapImgBase64String", std::string(), [&] {
         RequestContext& context = RequestContext::Current();
-        return lookhaven::base::ToBase64(store::EmapPictures(context.Records(), context.Home().Home()).Read(imageName));
+        return lookhaven::base::ToBase64(
+            lookhaven::emap::Pictures(context.Records(), context.Home().Home()).Read(imageName));
     });
     length = static_cast<int>(text.size());
     return text;

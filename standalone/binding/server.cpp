@@ -9,7 +9,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/binding/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 
@@ -88,7 +88,7 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
             if (!server.address.empty()) {
                 const std::string secret = may_have_token ? Servers().FindSecret(server.id) : "";
                 const std::string cookie =
-                    secret.empty() ? "" : timestamp + "-" + store::MakePairToken(secret, timestamp);
+                    secret.empty() ? "" : timestamp + "-" + lookhaven::binding::MakePairToken(secret, timestamp);
                 m_Servers.emplace(server.id, SlaveHx(server.address, server.port, cookie));
             }
         }
@@ -112,8 +112,8 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
     return OrFailure("IsAuthPairMatch", false, [&] {
         const std::int64_t now = UtcSeconds();
         bool matches = false;
-        for (const std::string& secret : Servers().AskersSecrets()) {
-            matches |= store::PairTokenMatches(cookie, timestamp, secret, now);
+        for (const std::string& secret : Servers().InboundPeerSecrets()) {
+            matches |= lookhaven::binding::PairTokenMatches(cookie, timestamp, secret, now);
         }
         if (matches) {
             RequestContext::Current().SetCaller(PAIR_AUTH_UID);

@@ -65,11 +65,22 @@ Camera Require(Cameras& cameras, int id) {
     return *camera;
 }
 
-media::ProbeResult Probe(const std::string& source, const std::optional<store::Credentials>& credentials) {
-    if (!store::IsSource(source)) {
-        throw Failure(kDataError, "a source begins with rtsp://, http://, https://, file: or test: and holds no account"
-                                  " or password: name the account with --account");
+void RequireSource(const std::string& source) {
+    const media::SourceKinds kinds = pattern::AllSourceKinds();
+    if (media::FindKind(kinds, source) == nullptr || !store::IsSource(source)) {
+        throw Failure(kDataError, "a source begins with " + media::ListKinds(kinds) +
+                                      " and holds no account or password: name the account with --account");
     }
+}
+
+void RequireSources(const Camera& camera) {
+    for (const store::CameraProfile& profile : camera.profiles) {
+        RequireSource(profile.source);
+    }
+}
+
+media::ProbeResult Probe(const std::string& source, const std::optional<store::Credentials>& credentials) {
+    RequireSource(source);
     media::Credentials login;
     if (credentials) {
         login = {credentials->account, credentials->password};
@@ -118,6 +129,7 @@ void Add(const Console& console, const Request& request) {
     Cameras cameras(store);
     Camera camera;
     request.options.ApplyTo(camera);
+    RequireSources(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
     FindOut(camera, request, credentials);
     RecordingPlan plan;
@@ -138,6 +150,7 @@ void Change(const Console& console, const Request& request) {
     Camera camera = Require(cameras, request.id);
     const store::CameraProfile before = *camera.FindProfile(camera.live_profile);
     request.options.ApplyTo(camera);
+    RequireSources(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
     const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
     if (live != nullptr && live->source != before.source) {
@@ -202,9 +215,7 @@ std::optional<int> AsId(const std::string& text) {
 media::ProbeResult ProbeTarget(const Console& console, const Request& request) {
     const std::optional<int> id = AsId(request.target);
     if (!id) {
-        if (!store::IsSource(request.target)) {
-            return Probe(request.target, std::nullopt);  // says what is wrong before a password is asked for
-        }
+        RequireSource(request.target);  // before a password is asked for
         return Probe(request.target, AskCredentials(request));
     }
     store::Store store = console.OpenStore();

@@ -7,6 +7,7 @@
 #include <map>
 
 #include "standalone/cli/commands.h"
+#include "standalone/pattern/pattern_source.h"
 
 namespace lookhaven::cli {
 
@@ -67,7 +68,7 @@ void CameraOptions::AddTo(CLI::App& command) {
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";
         const std::string of = " of the profile " + name;
         command.add_option(prefix + "source", profile.source,
-                           "Address" + of + ": rtsp://, http://, https://, file: or test:" +
+                           "Address" + of + ": " + media::ListKinds(pattern::AllSourceKinds()) +
                                (number == 0 ? "" : "; empty takes the profile away"));
         command.add_option(prefix + "size", profile.size, "Picture size" + of + ", such as 1280x720");
         command.add_option(prefix + "fps", profile.fps, "Frames per second" + of);

@@ -10,8 +10,8 @@
 #include "standalone/base/text.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/emap_items.h"
-#include "standalone/store/emap_json.h"
-#include "standalone/store/emap_pictures.h"
+#include "standalone/emap/item_json.h"
+#include "standalone/emap/pictures.h"
 
 namespace lookhaven::cli {
 
@@ -19,7 +19,6 @@ namespace {
 
 using store::Emap;
 using store::EmapItem;
-using store::EmapPictures;
 using store::Emaps;
 
 constexpr int kFileVersion = 1;
@@ -74,26 +73,26 @@ Emap AddFilled(store::Store& store, const Emap& emap, Fill&& fill) {
 }
 
 void Add(const Console& console, const Request& request) {
-    const std::string picture = ReadBounded(request.file, store::kMaxEmapPictureBytes);
+    const std::string picture = ReadBounded(request.file, emap::kMaxPictureBytes);
     store::Store store = console.OpenStore();
     Emap wanted{.name = request.name.value_or("")};
     wanted.hide_names = request.hide_names.value_or(false);
     wanted.small_items = request.small_items.value_or(false);
-    const Emap emap =
-        AddFilled(store, wanted, [&](int id) { EmapPictures(store, console.Installation().Home()).Put(id, picture); });
+    const Emap emap = AddFilled(store, wanted,
+                                [&](int id) { emap::Pictures(store, console.Installation().Home()).Put(id, picture); });
     console.Answer("The e-map " + emap.name + " has the id " + std::to_string(emap.id) + ".", ToData(emap));
 }
 
 void Change(const Console& console, const Request& request) {
     const std::optional<std::string> picture =
-        request.file.empty() ? std::nullopt : std::optional(ReadBounded(request.file, store::kMaxEmapPictureBytes));
+        request.file.empty() ? std::nullopt : std::optional(ReadBounded(request.file, emap::kMaxPictureBytes));
     store::Store store = console.OpenStore();
     Emap emap = RequireEmap(store, request.id);
     emap.name = request.name.value_or(emap.name);
     emap.hide_names = request.hide_names.value_or(emap.hide_names);
     emap.small_items = request.small_items.value_or(emap.small_items);
     if (picture) {
-        EmapPictures(store, console.Installation().Home()).Put(emap.id, *picture);
+        emap::Pictures(store, console.Installation().Home()).Put(emap.id, *picture);
     }
     Emaps(store).Update(emap);
     console.Answer("The e-map " + std::to_string(emap.id) + " is changed.", ToData(RequireEmap(store, emap.id)));
@@ -117,14 +116,14 @@ void Show(const Console& console, const Request& request) {
     const Emap emap = RequireEmap(store, request.id);
     const std::vector<EmapItem> items = Emaps(store).Items(emap.id);
     Json::Value data = ToData(emap);
-    data["items"] = store::ToJson(items);
+    data["items"] = emap::ToJson(items);
     console.Answer(emap.name + "\n\n" + Table(ItemRows(items)), data);
 }
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Emaps(store).Remove(request.id);
-    EmapPictures(store, console.Installation().Home()).Sweep();
+    emap::Pictures(store, console.Installation().Home()).Sweep();
     Json::Value data;
     data["id"] = request.id;
     console.Answer("The e-map " + std::to_string(request.id) + " is gone.", data);
@@ -138,8 +137,8 @@ void Export(const Console& console, const Request& request) {
     file["name"] = emap.name;
     file["hideItemName"] = emap.hide_names;
     file["smallItemSize"] = emap.small_items;
-    file["items"] = store::ToJson(Emaps(store).Items(emap.id));
-    file["picture"] = base::ToBase64(EmapPictures(store, console.Installation().Home()).Read(emap.image));
+    file["items"] = emap::ToJson(Emaps(store).Items(emap.id));
+    file["picture"] = base::ToBase64(emap::Pictures(store, console.Installation().Home()).Read(emap.image));
     base::WriteFileAtomically(request.file, ToJson(file) + "\n", 0644);
     Json::Value data;
     data["id"] = emap.id;
@@ -148,7 +147,7 @@ void Export(const Console& console, const Request& request) {
 }
 
 Json::Value ReadEmapFile(const std::string& path) {
-    const std::string text = ReadBounded(path, 2 * store::kMaxEmapPictureBytes);
+    const std::string text = ReadBounded(path, 2 * emap::kMaxPictureBytes);
     Json::Value file;
     Json::CharReaderBuilder builder;
     builder["stackLimit"] = 8;
@@ -174,13 +173,13 @@ void Import(const Console& console, const Request& request) {
     if (!picture) {
         throw Failure(kDataError, "the picture in " + request.file + " is damaged");
     }
-    std::vector<EmapItem> items = store::EmapItemsFromJson(file["items"]);
+    std::vector<EmapItem> items = emap::ItemsFromJson(file["items"]);
     store::Store store = console.OpenStore();
     const std::size_t all = items.size();
     std::erase_if(items, [&](const EmapItem& item) { return !Emaps(store).Knows(item); });
     Emap wanted{.name = request.name.value_or(file["name"].asString())};
     const Emap emap = AddFilled(store, wanted, [&](int id) {
-        EmapPictures(store, console.Installation().Home()).Put(id, *picture);
+        emap::Pictures(store, console.Installation().Home()).Put(id, *picture);
         Emap filled = RequireEmap(store, id);
         filled.hide_names = file["hideItemName"].asBool();
         filled.small_items = file["smallItemSize"].asBool();

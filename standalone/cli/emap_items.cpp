@@ -6,7 +6,7 @@
 #include <optional>
 
 #include "standalone/cli/commands.h"
-#include "standalone/store/emap_json.h"
+#include "standalone/emap/item_json.h"
 
 namespace lookhaven::cli {
 
@@ -59,7 +59,7 @@ void Edit(const Console& console, int id, ChangeItems&& change) {
     Json::Value data;
     data["id"] = id;
     data["revision"] = emap.revision;
-    data["items"] = store::ToJson(items);
+    data["items"] = emap::ToJson(items);
     console.Answer(sentence, data);
 }
 

@@ -6,7 +6,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/demo/demo_floor_plans.h"
 #include "standalone/store/devices.h"
-#include "standalone/store/emap_pictures.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/users.h"
 
@@ -70,7 +70,7 @@ std::vector<EmapItem> UpperFloor(const Ids& ids, const std::map<std::string, int
 
 int AddMap(store::Store& store, const std::filesystem::path& home, const char* name, const char* picture) {
     const int id = store::Emaps(store).Add({.name = name});
-    store::EmapPictures(store, home).Put(id, picture);
+    emap::Pictures(store, home).Put(id, picture);
     return id;
 }
 

@@ -20,7 +20,7 @@ constexpr std::array<std::pair<RecordingState, const char*>, 7> kNames{{
     {RecordingState::kDiskFails, "disk-fails"},
     {RecordingState::kMountGone, "mount-gone"},
     {RecordingState::kNoMount, "no-mount"},
-    {RecordingState::kNoNumber, "no-number"},
+    {RecordingState::kNoEventId, "no-number"},
 }};
 
 std::filesystem::path PathOf(const base::Installation& installation) {

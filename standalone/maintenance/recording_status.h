@@ -24,7 +24,7 @@ enum class RecordingState {
     kDiskFails,  // paused: writing to the mount fails
     kMountGone,  // paused: the mount's folder is missing or lacks its marker
     kNoMount,    // there is no mount to record to: lookhaven mount add
-    kNoNumber,   // paused: no event ids are left, because the store has been unavailable for long
+    kNoEventId,  // paused: no event ids are left, because the store has been unavailable for long
 };
 
 // "ready", "recording", "disk-full", "disk-fails", "mount-gone", "no-mount", "no-number"

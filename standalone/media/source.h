@@ -16,6 +16,7 @@
 #include <stdexcept>
 #include <stop_token>
 #include <string>
+#include <string_view>
 
 #include "standalone/media/packet.h"
 
@@ -60,11 +61,17 @@ class Source {
 using SourceOpener = std::unique_ptr<Source> (*)(const std::string& url, const SourceOptions& options,
                                                  std::stop_token stop);
 
-// The kinds of source that a program knows, by URL scheme in lower case.
+// The kinds of source that a program knows, by how their URLs begin.
 using SourceKinds = std::map<std::string, SourceOpener>;
 
-// The table in source_kinds.cpp: rtsp, http, https and file. A program may add others.
+// The table in source_kinds.cpp: "rtsp://", "http://", "https://" and "file:". A program may add others.
 SourceKinds CameraKinds();
+
+// Null for a URL of no kind, or without a host where its kind has one.
+SourceOpener FindKind(const SourceKinds& kinds, std::string_view url);
+
+// "file:, http:// or rtsp://", for messages.
+std::string ListKinds(const SourceKinds& kinds);
 
 // Connects and reads as much as is needed to know the codecs. A stop request ends this and any later wait within about
 // 0.1 s, except that resolving a host name cannot be interrupted. Throws SourceError.

@@ -4,7 +4,7 @@
 namespace lookhaven::media {
 
 SourceKinds CameraKinds() {
-    return {{"rtsp", OpenRtsp}, {"http", OpenMjpegHttp}, {"https", OpenMjpegHttp}, {"file", OpenFileLoop}};
+    return {{"rtsp://", OpenRtsp}, {"http://", OpenMjpegHttp}, {"https://", OpenMjpegHttp}, {"file:", OpenFileLoop}};
 }
 
 }  // namespace lookhaven::media

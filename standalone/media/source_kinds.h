@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The kinds of camera source. To add one: write its class in a file of its own (rtsp_source.cpp shows how little it
-// needs), declare its SourceOpener here, give it a scheme in source_kinds.cpp, and let IsSource in store/text.cpp accept
-// that scheme.
+// needs), declare its SourceOpener here, and name it in source_kinds.cpp.
 #pragma once
 
 #include <memory>

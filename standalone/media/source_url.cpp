@@ -15,14 +15,6 @@ constexpr std::string_view kUnescaped = "-._~!*";
 
 }  // namespace
 
-std::string UrlScheme(std::string_view url) {
-    std::string scheme(url.substr(0, url.find(':') == url.npos ? 0 : url.find(':')));
-    for (char& c : scheme) {
-        c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-    }
-    return scheme;
-}
-
 std::string WithCredentials(const std::string& url, const Credentials& credentials) {
     const std::size_t host = url.find("://");
     if (host == url.npos || (credentials.user.empty() && credentials.password.empty())) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Parts of source URLs; adds credentials for libav and removes them for logs.
+// Source URLs: adds credentials for libav and removes them for logs.
 #pragma once
 
 #include <string>
@@ -9,9 +9,6 @@
 #include "standalone/media/source.h"
 
 namespace lookhaven::media {
-
-// What stands before the first colon, in lower case; empty when there is no colon.
-std::string UrlScheme(std::string_view url);
 
 // The URL with user and password in front of its host, percent-encoded; unchanged without credentials. Throws
 // SourceError when they exceed libav's buffer, which would truncate them silently.

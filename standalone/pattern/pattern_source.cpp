@@ -147,7 +147,7 @@ std::unique_ptr<media::Source> OpenPattern(const std::string& url, const media::
 
 media::SourceKinds AllSourceKinds() {
     media::SourceKinds kinds = media::CameraKinds();
-    kinds.emplace("test", OpenPattern);
+    kinds.emplace("test:", OpenPattern);
     return kinds;
 }
 

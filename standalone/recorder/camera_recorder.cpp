@@ -147,7 +147,7 @@ std::optional<EventStart> CameraRecorder::Prepare(std::int64_t first_us) {
     }
     const std::optional<int> id = context_.rows.TakeId();
     if (!id) {
-        Pause(RecordingState::kNoNumber, "the store has given out no number for an event yet");
+        Pause(RecordingState::kNoEventId, "the store has given out no number for an event yet");
         return std::nullopt;
     }
     return EventStart{*id, camera_, request_.plan.mount_id, request_.plan.mount, WallOf(first_us), first_us, Reason()};

@@ -17,10 +17,12 @@ constexpr int kProfileCount = 3;
 // One stream of a camera; its number is that of the live stream too.
 struct CameraProfile {
     int number = 0;      // 0 … kProfileCount - 1
-    std::string source;  // "rtsp://", "http://", "https://", "file:" or "test:", without account and password
+    std::string source;  // such as "rtsp://host/path", without account and password
     int width = 0;       // as asked for; 0 = as the source has it
     int height = 0;
     int fps = 0;
+
+    friend bool operator==(const CameraProfile&, const CameraProfile&) = default;
 };
 
 struct Camera {
@@ -35,9 +37,11 @@ struct Camera {
 
     // Null when the camera lacks that profile.
     const CameraProfile* FindProfile(int number) const;
+
+    friend bool operator==(const Camera&, const Camera&) = default;
 };
 
-// What the recorder logs in to the camera with.
+// The recorder's login at the camera.
 struct Credentials {
     std::string account;
     std::string password;
@@ -50,7 +54,8 @@ class Cameras {
     // The store must outlive this object.
     explicit Cameras(Store& store) : connection_(store.connection()) {}
 
-    // Stores the record under a new id, which it returns; the record's own id is not looked at. Throws InvalidRecord.
+    // Stores the record under a new id, which it returns; camera.id is ignored. Any kind of source may be stored: whether this
+    // program knows how to open it is for the caller to check. Throws InvalidRecord.
     int Add(const Camera& camera);
     // Replaces the record of camera.id. Throws InvalidRecord or NotFound.
     void Update(const Camera& camera);
@@ -60,7 +65,7 @@ class Cameras {
     std::optional<Camera> Find(int id);
     std::vector<Camera> List();  // by id
 
-    // Nothing removes them. Throws NotFound for an unknown camera.
+    // nullopt removes them. Throws InvalidRecord, or NotFound for an unknown camera.
     void SetCredentials(int id, const std::optional<Credentials>& credentials);
     std::optional<Credentials> FindCredentials(int id);
 

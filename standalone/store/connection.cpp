@@ -6,6 +6,7 @@
 #include <soci/postgresql/soci-postgresql.h>
 #include <soci/sqlite3/soci-sqlite3.h>
 
+#include "standalone/store/text.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::store {
@@ -17,6 +18,8 @@ constexpr std::string_view kPostgresqlPrefix = "postgresql:";
 
 // How long a writer waits for another one.
 constexpr const char* kBusyTimeoutS = "5";
+
+constexpr std::size_t kMaxNameBytes = 64;
 
 // A server that is away or hangs must not hold up the recorder or a request for minutes. What the address itself says
 // about connecting goes first.
@@ -65,14 +68,10 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
 }
 
 bool Connection::HasTable(const std::string& name) {
-    return Read([&](soci::session& sql) {
-        int found = 0;
-        sql << (IsSqlite()
-                    ? "select count(*) from sqlite_master where type = 'table' and name = :name"
-                    : "select count(*) from pg_tables where schemaname = current_schema() and tablename = :name"),
-            soci::use(name, "name"), soci::into(found);
-        return found > 0;
-    });
+    const char* query = IsSqlite() ? "select count(*) from sqlite_master where type = 'table' and name = :name"
+                                   : "select count(*) from pg_tables where schemaname = current_schema()"
+                                     " and tablename = :name";
+    return FetchOne<int>(query, name).value() > 0;
 }
 
 // SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the time-out,
@@ -108,25 +107,33 @@ Connection::Transaction::~Transaction() {
 }
 
 int NextId(soci::session& sql, const std::string& counter) {
-    int id = 0;
-    sql << "update counters set value = case when name = 'user' and value + 1 = :reserved then value + 2"
-           " else value + 1 end where name = :counter returning value",
-        soci::use(kPeerUserId, "reserved"), soci::use(counter, "counter"), soci::into(id);
-    return id;
+    return FetchOne<int>(sql,
+                         "update counters set value = case when name = 'user' and value + 1 = :reserved then value + 2"
+                         " else value + 1 end where name = :counter returning value",
+                         kPeerUserId, counter)
+        .value();
 }
 
 int NextIds(soci::session& sql, const std::string& counter, int count) {
-    int last = 0;
-    sql << "update counters set value = value + :count where name = :counter returning value",
-        soci::use(count, "count"), soci::use(counter, "counter"), soci::into(last);
-    return last - count + 1;
+    const char* update = "update counters set value = value + :count where name = :counter returning value";
+    return FetchOne<int>(sql, update, count, counter).value() - count + 1;
+}
+
+void ThrowNotFound(const std::string& what, int id) {
+    throw NotFound("there is no " + what + " " + std::to_string(id));
 }
 
 void RequireCameraRow(soci::session& sql, int id) {
-    int found = 0;
-    sql << "select id from cameras where id = :id", soci::use(id, "id"), soci::into(found);
-    if (!sql.got_data()) {
-        throw NotFound("there is no camera " + std::to_string(id));
+    Require(FetchOne<int>(sql, "select id from cameras where id = :id", id), "camera", id);
+}
+
+void RequireFreeName(soci::session& sql, const std::string& table, const std::string& what, int id,
+                     const std::string& name) {
+    if (name.empty() || !IsPlainText(name, kMaxNameBytes)) {
+        throw InvalidRecord(what + "'s name is 1 to 64 bytes of UTF-8 without control characters");
+    }
+    if (Exists(sql, "select id from " + table + " where name = :name and id <> :id", name, id)) {
+        throw AlreadyExists("there is already " + what + " \"" + name + "\"");
     }
 }
 

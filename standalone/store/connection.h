@@ -1,43 +1,45 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The one place where SOCI and the difference between the two engines stand; included by this folder's sources only.
+// A connection, the differences between the two engines, and what several records share. For this folder's sources.
 #pragma once
 
-#include <memory>
+#include <optional>
 #include <string>
 #include <type_traits>
 #include <utility>
+#include <vector>
 
 #include <soci/soci.h>
 
+#include "standalone/store/query.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::store {
 
 enum class Engine { kSqlite, kPostgresql };
 
-// Whether a power cut right after the change may lose it. Changes that come every second and that the next one repeats
+// Whether a power cut right after a change may lose it. A change that comes every second, and that the next one supersedes,
 // need not wait for the disk.
 enum class Durability { kSafe, kLazy };
 
-// A store's address, taken apart.
+// A store's URL, parsed.
 struct StoreAddress {
     Engine engine;
-    std::string location;  // the file's path, or what PostgreSQL connects by
+    std::string location;  // the file's path, or PostgreSQL's URL or connection options
 
-    // Throws StoreError for a text that is neither.
+    // Throws StoreError for a URL of neither engine.
     static StoreAddress Parse(const std::string& url);
 };
 
 class Connection {
   public:
-    // Opens the file or connects; an absent SQLite file would be created. Throws StoreError.
+    // Opens the file or connects; creates an absent SQLite file. Throws StoreError.
     explicit Connection(const StoreAddress& address);
 
     bool IsSqlite() const { return engine_ == Engine::kSqlite; }
     bool HasTable(const std::string& name);
 
-    // Calls ask(session). Throws StoreError where the engine fails; its text never holds a bound value.
+    // Calls ask(session). Throws StoreError where the engine fails; its text never holds a parameter's value.
     template <typename Ask>
     auto Read(Ask&& ask) {
         try {
@@ -47,7 +49,7 @@ class Connection {
         }
     }
 
-    // Calls change(session) inside a transaction that is taken back when change throws.
+    // Calls change(session) inside a transaction, which is rolled back when change throws.
     template <typename Change>
     auto Write(Change&& change, Durability durability = Durability::kSafe) {
         return Read([&](soci::session& sql) {
@@ -61,6 +63,21 @@ class Connection {
                 return result;
             }
         });
+    }
+
+    // As the functions of query.h, each in a Read of its own.
+    template <typename Row, typename... Parameter>
+    std::optional<Row> FetchOne(const std::string& text, const Parameter&... parameters) {
+        return Read([&](soci::session& sql) { return store::FetchOne<Row>(sql, text, parameters...); });
+    }
+    template <typename Row, typename Rows = std::vector<Row>, typename... Parameter>
+    Rows FetchAll(const std::string& text, const Parameter&... parameters) {
+        return Read([&](soci::session& sql) { return store::FetchAll<Row, Rows>(sql, text, parameters...); });
+    }
+    // Likewise, in a Write of its own.
+    template <typename... Parameter>
+    int Execute(const std::string& text, const Parameter&... parameters) {
+        return Write([&](soci::session& sql) { return store::Execute(sql, text, parameters...); });
     }
 
   private:
@@ -86,11 +103,27 @@ class Connection {
 // for each other until the commit.
 int NextId(soci::session& sql, const std::string& counter);
 
-// The first of that many ids in a row. Inside Write only.
+// The first of that many consecutive ids. Inside Write only.
 int NextIds(soci::session& sql, const std::string& counter, int count);
 
-// Throws NotFound. Inside Write only.
+[[noreturn]] void ThrowNotFound(const std::string& what, int id);
+
+// What was found. Throws NotFound, "there is no <what> <id>", for nothing.
+template <typename Found>
+Found Require(std::optional<Found> found, const std::string& what, int id) {
+    if (!found) {
+        ThrowNotFound(what, id);
+    }
+    return *std::move(found);
+}
+
+// Throws NotFound.
 void RequireCameraRow(soci::session& sql, int id);
+
+// Throws InvalidRecord for what is no name of 1 to 64 bytes, AlreadyExists for that of another record of the table. what:
+// "an e-map", for the message. Inside Write only.
+void RequireFreeName(soci::session& sql, const std::string& table, const std::string& what, int id,
+                     const std::string& name);
 
 // Tells those who poll Settings::Revision() that cameras or settings changed. Inside Write only.
 void RaiseRevision(soci::session& sql);

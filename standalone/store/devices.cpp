@@ -3,18 +3,54 @@
 
 #include <algorithm>
 #include <array>
-#include <limits>
 #include <string_view>
+#include <utility>
 
 #include "standalone/store/connection.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
 
+template <>
+struct Mapping<Device> {
+    static constexpr const char* kTable = "devices";
+    static constexpr const char* kColumns = "kind, id, name, server_id, id_on_server, camera_id";
+    static auto Members(auto& device) {
+        return std::tie(device.kind, device.id, device.name, device.server_id, device.id_on_server, device.camera_id);
+    }
+};
+
+using PortRow = std::tuple<EmapItemType, int, int, PortType, int>;
+
+template <>
+struct Mapping<PortRow> {
+    static constexpr const char* kTable = "device_ports";
+    static constexpr const char* kColumns = "kind, device_id, port, type, camera_id";
+};
+
+template <>
+struct Mapping<PortCounts> {
+    static auto Members(auto& counts) { return std::tie(counts.inputs, counts.outputs); }
+};
+
+using PortCountsRow = std::pair<int, PortCounts>;
+
+template <>
+struct Mapping<PortCountsRow> {
+    static constexpr const char* kTable = "camera_ports";
+    static constexpr const char* kColumns = "camera_id, inputs, outputs";
+};
+
+template <>
+struct Mapping<DeviceState> {
+    static constexpr const char* kTable = "device_states";
+    static constexpr const char* kColumns = "kind, device_id, port, state, since_s";
+    static auto Members(auto& state) { return std::tie(state.kind, state.id, state.port, state.state, state.since_s); }
+};
+
 namespace {
 
 constexpr std::size_t kMaxNameBytes = 64;
-constexpr int kAny = -1;
 
 // What the sentences call a device, and where its ids come from.
 struct Kind {
@@ -35,70 +71,51 @@ Kind KindOf(EmapItemType kind) {
     }
 }
 
-// id, server and id_on_server narrow the list where they are not kAny.
-std::vector<Device> Fetch(soci::session& sql, EmapItemType kind, int id, int server, int id_on_server) {
-    const int number = static_cast<int>(kind);
-    Device device;
-    device.kind = kind;
-    soci::statement rows =
-        (sql.prepare << "select id, name, server_id, id_on_server, camera_id from devices where kind = :kind"
-                        " and (:any_id = -1 or id = :id) and (:any_server = -1 or server_id = :server)"
-                        " and (:any_there = -1 or id_on_server = :there) order by id",
-         soci::use(number, "kind"), soci::use(id, "any_id"), soci::use(id, "id"), soci::use(server, "any_server"),
-         soci::use(server, "server"), soci::use(id_on_server, "any_there"), soci::use(id_on_server, "there"),
-         soci::into(device.id), soci::into(device.name), soci::into(device.server_id), soci::into(device.id_on_server),
-         soci::into(device.camera_id));
-    rows.execute();
-    std::vector<Device> devices;
-    while (rows.fetch()) {
-        devices.push_back(device);
+Device WithPorts(soci::session& sql, Device device) {
+    if (device.kind == EmapItemType::kIoModule) {
+        for (const auto& [kind, id, index, type, camera] :
+             FetchAll<PortRow>(sql, "where kind = :kind and device_id = :id", device.kind, device.id)) {
+            device.ports[index] = {type, camera};
+        }
     }
-    return devices;
+    return device;
 }
 
-void FetchPorts(soci::session& sql, Device& device) {
-    const int kind = static_cast<int>(device.kind);
-    int index = 0;
-    int type = 0;
-    int camera = 0;
-    soci::statement rows =
-        (sql.prepare << "select port, type, camera_id from device_ports where kind = :kind"
-                        " and device_id = :id order by port",
-         soci::use(kind, "kind"), soci::use(device.id, "id"), soci::into(index), soci::into(type), soci::into(camera));
-    rows.execute();
-    while (rows.fetch()) {
-        device.ports[index] = {static_cast<PortType>(type), camera};
-    }
-}
-
-std::vector<Device> FetchWhole(soci::session& sql, EmapItemType kind, int id, int server, int id_on_server) {
-    std::vector<Device> devices = Fetch(sql, kind, id, server, id_on_server);
+// condition: what narrows the list within its kind.
+template <typename... Parameter>
+std::vector<Device> FetchDevices(soci::session& sql, const std::string& condition, EmapItemType kind,
+                                 const Parameter&... parameters) {
+    std::vector<Device> devices =
+        FetchAll<Device>(sql, "where kind = :kind" + condition + " order by id", kind, parameters...);
     for (Device& device : devices) {
-        FetchPorts(sql, device);
+        device = WithPorts(sql, std::move(device));
     }
     return devices;
 }
 
-Device Require(soci::session& sql, EmapItemType kind, int id) {
-    std::vector<Device> found = FetchWhole(sql, kind, id, kAny, kAny);
-    if (found.empty()) {
-        throw NotFound(std::string("there is no ") + KindOf(kind).name + " " + std::to_string(id));
-    }
-    return std::move(found.front());
+template <typename... Parameter>
+std::optional<Device> FetchDevice(soci::session& sql, const std::string& condition, EmapItemType kind,
+                                  const Parameter&... parameters) {
+    std::vector<Device> found = FetchDevices(sql, condition, kind, parameters...);
+    return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
 }
 
-void RequireCamera(soci::session& sql, int id) {
-    int found = 0;
-    sql << "select id from cameras where id = :id union select id from remote_cameras where id = :remote",
-        soci::use(id, "id"), soci::use(id, "remote"), soci::into(found);
-    if (!sql.got_data()) {
-        throw NotFound("there is no camera " + std::to_string(id));
-    }
+constexpr const char* kWithId = " and id = :id";
+constexpr const char* kOnServer = " and server_id = :server and id_on_server = :there";
+
+Device RequireDevice(soci::session& sql, EmapItemType kind, int id) {
+    return Require(FetchDevice(sql, kWithId, kind, id), KindOf(kind).name, id);
+}
+
+// A camera of this host or of a recording server.
+void RequireAnyCamera(soci::session& sql, int id) {
+    const char* query = "select id from cameras where id = :id union select id from remote_cameras where id = :remote";
+    Require(FetchOne<int>(sql, query, id, id), "camera", id);
 }
 
 void RequirePairedCamera(soci::session& sql, int id) {
     if (id != 0) {
-        RequireCamera(sql, id);
+        RequireAnyCamera(sql, id);
     }
 }
 
@@ -124,25 +141,11 @@ void RequireValid(const Device& device) {
     }
 }
 
-void RequireServer(soci::session& sql, int id) {
-    int found = 0;
-    sql << "select id from servers where id = :id", soci::use(id, "id"), soci::into(found);
-    if (!sql.got_data()) {
-        throw NotFound("there is no server " + std::to_string(id));
-    }
-}
-
 void ReplacePorts(soci::session& sql, const Device& device) {
-    const int kind = static_cast<int>(device.kind);
-    sql << "delete from device_ports where kind = :kind and device_id = :id", soci::use(kind, "kind"),
-        soci::use(device.id, "id");
+    Execute(sql, "delete from device_ports where kind = :kind and device_id = :id", device.kind, device.id);
     for (const auto& [index, port] : device.ports) {
         RequirePairedCamera(sql, port.camera_id);
-        const int type = static_cast<int>(port.type);
-        sql << "insert into device_ports (kind, device_id, port, type, camera_id)"
-               " values (:kind, :id, :port, :type, :camera)",
-            soci::use(kind, "kind"), soci::use(device.id, "id"), soci::use(index, "port"), soci::use(type, "type"),
-            soci::use(port.camera_id, "camera");
+        Insert(sql, PortRow(device.kind, device.id, index, port.type, port.camera_id));
     }
 }
 
@@ -163,19 +166,15 @@ int Devices::Add(const Device& device) {
         if (added.server_id == 0) {
             added.id_on_server = added.id;
         } else {
-            RequireServer(sql, added.server_id);
-            if (!Fetch(sql, added.kind, kAny, added.server_id, added.id_on_server).empty()) {
+            Require(FetchOne<int>(sql, "select id from servers where id = :id", added.server_id), "server",
+                    added.server_id);
+            if (FetchDevice(sql, kOnServer, added.kind, added.server_id, added.id_on_server)) {
                 throw AlreadyExists(std::string("this ") + KindOf(device.kind).name +
                                     " of the server is known already");
             }
         }
         RequirePairedCamera(sql, added.camera_id);
-        const int kind = static_cast<int>(added.kind);
-        sql << "insert into devices (kind, id, name, server_id, id_on_server, camera_id)"
-               " values (:kind, :id, :name, :server, :there, :camera)",
-            soci::use(kind, "kind"), soci::use(added.id, "id"), soci::use(added.name, "name"),
-            soci::use(added.server_id, "server"), soci::use(added.id_on_server, "there"),
-            soci::use(added.camera_id, "camera");
+        Insert(sql, added);
         ReplacePorts(sql, added);
         RaiseRevision(sql);
         return added.id;
@@ -185,16 +184,14 @@ int Devices::Add(const Device& device) {
 void Devices::Update(const Device& device) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        Device changed = Require(sql, device.kind, device.id);
+        Device changed = RequireDevice(sql, device.kind, device.id);
         changed.name = device.name;
         changed.camera_id = device.camera_id;
         changed.ports = device.ports;
         RequireValid(changed);
         RequirePairedCamera(sql, changed.camera_id);
-        const int kind = static_cast<int>(changed.kind);
-        sql << "update devices set name = :name, camera_id = :camera where kind = :kind and id = :id",
-            soci::use(changed.name, "name"), soci::use(changed.camera_id, "camera"), soci::use(kind, "kind"),
-            soci::use(changed.id, "id");
+        Execute(sql, "update devices set name = :name, camera_id = :camera where kind = :kind and id = :id",
+                changed.name, changed.camera_id, changed.kind, changed.id);
         ReplacePorts(sql, changed);
     });
 }
@@ -202,26 +199,22 @@ void Devices::Update(const Device& device) {
 void Devices::Remove(EmapItemType kind, int id) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        Require(sql, kind, id);
-        const int number = static_cast<int>(kind);
-        sql << "delete from devices where kind = :kind and id = :id", soci::use(number, "kind"), soci::use(id, "id");
+        RequireDevice(sql, kind, id);
+        Execute(sql, "delete from devices where kind = :kind and id = :id", kind, id);
     });
 }
 
 std::optional<Device> Devices::Find(EmapItemType kind, int id) {
-    std::vector<Device> found =
-        connection_.Read([&](soci::session& sql) { return FetchWhole(sql, kind, id, kAny, kAny); });
-    return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
+    return connection_.Read([&](soci::session& sql) { return FetchDevice(sql, kWithId, kind, id); });
 }
 
 std::optional<Device> Devices::FindOnServer(EmapItemType kind, int server_id, int id_on_server) {
-    std::vector<Device> found =
-        connection_.Read([&](soci::session& sql) { return FetchWhole(sql, kind, kAny, server_id, id_on_server); });
-    return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
+    return connection_.Read(
+        [&](soci::session& sql) { return FetchDevice(sql, kOnServer, kind, server_id, id_on_server); });
 }
 
 std::vector<Device> Devices::List(EmapItemType kind) {
-    return connection_.Read([&](soci::session& sql) { return FetchWhole(sql, kind, kAny, kAny, kAny); });
+    return connection_.Read([&](soci::session& sql) { return FetchDevices(sql, "", kind); });
 }
 
 void Devices::SetCameraPorts(int camera_id, PortCounts counts) {
@@ -230,34 +223,22 @@ void Devices::SetCameraPorts(int camera_id, PortCounts counts) {
     }
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireCamera(sql, camera_id);
-        sql << "delete from camera_ports where camera_id = :id", soci::use(camera_id, "id");
+        RequireAnyCamera(sql, camera_id);
+        Execute(sql, "delete from camera_ports where camera_id = :id", camera_id);
         if (counts.inputs + counts.outputs > 0) {
-            sql << "insert into camera_ports (camera_id, inputs, outputs) values (:id, :inputs, :outputs)",
-                soci::use(camera_id, "id"), soci::use(counts.inputs, "inputs"), soci::use(counts.outputs, "outputs");
+            Insert(sql, PortCountsRow(camera_id, counts));
         }
     });
 }
 
 std::map<int, PortCounts> Devices::CameraPorts() {
-    return connection_.Read([](soci::session& sql) {
-        std::map<int, PortCounts> ports;
-        int camera = 0;
-        PortCounts counts;
-        soci::statement rows = (sql.prepare << "select camera_id, inputs, outputs from camera_ports",
-                                soci::into(camera), soci::into(counts.inputs), soci::into(counts.outputs));
-        rows.execute();
-        while (rows.fetch()) {
-            ports[camera] = counts;
-        }
-        return ports;
-    });
+    return connection_.FetchAll<PortCountsRow, std::map<int, PortCounts>>("");
 }
 
 void Devices::Report(const DeviceState& state) {
     connection_.Write(
         [&](soci::session& sql) {
-            const Device device = Require(sql, state.kind, state.id);
+            const Device device = RequireDevice(sql, state.kind, state.id);
             const bool is_door = state.kind == EmapItemType::kDoor;
             if (is_door ? state.port != -1 : !device.ports.contains(state.port)) {
                 throw NotFound(std::string("the ") + KindOf(state.kind).name + " " + std::to_string(state.id) +
@@ -266,36 +247,18 @@ void Devices::Report(const DeviceState& state) {
             if (!IsStateOf(state.kind, state.state)) {
                 throw InvalidRecord("a door is open, closed or locked, a port is on or off");
             }
-            const int kind = static_cast<int>(state.kind);
-            const long long since = state.since_s;
-            sql << "insert into device_states (kind, device_id, port, state, since_s)"
-                   " values (:kind, :id, :port, :state, :since) on conflict (kind, device_id, port)"
-                   " do update set state = excluded.state, since_s = excluded.since_s"
-                   " where device_states.state <> excluded.state",
-                soci::use(kind, "kind"), soci::use(state.id, "id"), soci::use(state.port, "port"),
-                soci::use(state.state, "state"), soci::use(since, "since");
+            Execute(sql,
+                    "insert into device_states (kind, device_id, port, state, since_s)"
+                    " values (:kind, :id, :port, :state, :since) on conflict (kind, device_id, port)"
+                    " do update set state = excluded.state, since_s = excluded.since_s"
+                    " where device_states.state <> excluded.state",
+                    state.kind, state.id, state.port, state.state, state.since_s);
         },
         Durability::kLazy);
 }
 
 std::vector<DeviceState> Devices::States() {
-    return connection_.Read([](soci::session& sql) {
-        std::vector<DeviceState> states;
-        DeviceState state;
-        int kind = 0;
-        long long since = 0;
-        soci::statement rows = (sql.prepare << "select kind, device_id, port, state, since_s from device_states"
-                                               " order by kind, device_id, port",
-                                soci::into(kind), soci::into(state.id), soci::into(state.port), soci::into(state.state),
-                                soci::into(since));
-        rows.execute();
-        while (rows.fetch()) {
-            state.kind = static_cast<EmapItemType>(kind);
-            state.since_s = since;
-            states.push_back(state);
-        }
-        return states;
-    });
+    return connection_.FetchAll<DeviceState>("order by kind, device_id, port");
 }
 
 }  // namespace lookhaven::store

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What stands on e-maps beside cameras and links: doors, I/O modules, POS terminals (tills), and cameras' inputs and
-// outputs.
+// What stands on e-maps beside cameras and links: doors, I/O modules, POS terminals, and cameras' inputs and outputs.
 #pragma once
 
 #include <cstdint>
@@ -26,14 +25,14 @@ struct Port {
 
 constexpr int kMaxPorts = 64;
 
-// A door, an I/O module or a till. Doors are always this host's own.
+// A door, an I/O module or a POS terminal. Doors are always this host's own.
 struct Device {
     EmapItemType kind = EmapItemType::kDoor;
     int id = 0;                      // from 1, never used twice within its kind
     std::string name = {};           // UTF-8, 1 to 64 bytes
     int server_id = 0;               // the recording server that owns it; 0: this host
     int id_on_server = 0;            // its id there; the same as id for this host's own
-    int camera_id = 0;               // that watches a door or till, by its id on this host; 0: none
+    int camera_id = 0;               // that watches a door or POS terminal, by its id on this host; 0: none
     std::map<int, Port> ports = {};  // of an I/O module, by index from 0
 };
 
@@ -63,7 +62,7 @@ class Devices {
     int Add(const Device& device);
     // Replaces name, paired camera and ports of the device. Throws InvalidRecord or NotFound.
     void Update(const Device& device);
-    // Items of it stay on their maps, where nobody sees them but a door's, which is shown without a state. Throws NotFound.
+    // Its items stay on their maps, hidden, except a door's, which is shown without a state. Throws NotFound.
     void Remove(EmapItemType kind, int id);
 
     std::optional<Device> Find(EmapItemType kind, int id);
@@ -74,7 +73,8 @@ class Devices {
     void SetCameraPorts(int camera_id, PortCounts counts);
     std::map<int, PortCounts> CameraPorts();  // by camera, only those that have any
 
-    // Throws NotFound for an unknown device or port, InvalidRecord for a state that its kind does not have.
+    // Throws NotFound for an unknown device or port, InvalidRecord for a state that its kind does not have. A power cut may
+    // lose a report that has returned.
     void Report(const DeviceState& state);
     std::vector<DeviceState> States();
 

@@ -33,46 +33,20 @@ void RequireEvent(const Event& event) {
     }
 }
 
-// The one statement that makes rows; the row outlives it.
-soci::statement PrepareInsert(soci::session& sql, const EventRow& row) {
-    const Event& event = row.event;
-    return (
-        sql.prepare << "insert into events (id, camera_id, mount_id, start_s, end_s, recording, reason, frame_count,"
-                       " size_bytes, video_type, audio_codec, width, height, path, archived, demo)"
-                       " values (:id, :camera, :mount, :start, :end, :recording, :reason, :frames, :size, :type,"
-                       " :codec, :width, :height, :path, :archived, :demo)",
-        soci::use(event.id, "id"), soci::use(event.camera_id, "camera"), soci::use(event.mount_id, "mount"),
-        soci::use(row.start, "start"), soci::use(row.end, "end"), soci::use(row.recording, "recording"),
-        soci::use(event.reason, "reason"), soci::use(event.frame_count, "frames"), soci::use(row.size, "size"),
-        soci::use(row.video_type, "type"), soci::use(event.audio_codec, "codec"), soci::use(event.width, "width"),
-        soci::use(event.height, "height"), soci::use(event.path, "path"), soci::use(row.archived, "archived"),
-        soci::use(row.demo, "demo"));
-}
-
-bool Affects(soci::statement& change) {
-    change.execute(true);
-    return change.get_affected_rows() > 0;
-}
-
 bool SetProgress(Connection& connection, int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes,
                  bool recording) {
     const Durability durability = recording ? Durability::kLazy : Durability::kSafe;
     return connection.Write(
         [&](soci::session& sql) {
-            Number start = 0;
-            sql << "select start_s from events where id = :id", soci::use(id, "id"), soci::into(start);
-            if (!sql.got_data()) {
+            const auto start_s = FetchOne<std::int64_t>(sql, "select start_s from events where id = :id", id);
+            if (!start_s) {
                 return false;
             }
-            RequireSpan(start, end_s);
-            const Number end = end_s;
-            const Number size = size_bytes;
-            const int goes_on = recording;
-            soci::statement change = (sql.prepare << "update events set end_s = :end, frame_count = :frames,"
-                                                     " size_bytes = :size, recording = :recording where id = :id",
-                                      soci::use(end, "end"), soci::use(frame_count, "frames"), soci::use(size, "size"),
-                                      soci::use(goes_on, "recording"), soci::use(id, "id"));
-            return Affects(change);
+            RequireSpan(*start_s, end_s);
+            return Execute(sql,
+                           "update events set end_s = :end, frame_count = :frames, size_bytes = :size,"
+                           " recording = :recording where id = :id",
+                           end_s, frame_count, size_bytes, recording, id) > 0;
         },
         durability);
 }
@@ -80,36 +54,33 @@ bool SetProgress(Connection& connection, int id, std::int64_t end_s, int frame_c
 }  // namespace
 
 int Events::NextId() {
-    return connection_.Write([](soci::session& sql) { return lookhaven::store::NextId(sql, "event"); });
+    return connection_.Write([](soci::session& sql) { return store::NextId(sql, "event"); });
 }
 
 int Events::NextIds(int count) {
-    return connection_.Write([&](soci::session& sql) { return lookhaven::store::NextIds(sql, "event", count); });
+    return connection_.Write([&](soci::session& sql) { return store::NextIds(sql, "event", count); });
 }
 
 void Events::Begin(const Event& event) {
     RequireEvent(event);
     connection_.Write([&](soci::session& sql) {
-        int found = 0;
-        sql << "select id from events where id = :id", soci::use(event.id, "id"), soci::into(found);
-        if (sql.got_data()) {
+        if (Exists(sql, "select id from events where id = :id", event.id)) {
             throw AlreadyExists("there is already an event " + std::to_string(event.id));
         }
-        const EventRow row(event);
-        PrepareInsert(sql, row).execute(true);
+        Insert(sql, event);
     });
 }
 
 void Events::AddAll(std::span<const Event> events) {
     std::ranges::for_each(events, RequireEvent);
     connection_.Write([&](soci::session& sql) {
-        int id = lookhaven::store::NextIds(sql, "event", static_cast<int>(events.size()));
-        EventRow row;
-        soci::statement insert = PrepareInsert(sql, row);
+        int id = store::NextIds(sql, "event", static_cast<int>(events.size()));
+        Event row;
+        soci::statement insert = PrepareInsert(sql, kRepeatedly, row);
         for (const Event& event : events) {
-            row.Assign(event);
-            row.event.id = id++;
-            insert.execute(true);
+            row = event;
+            row.id = id++;
+            Run(insert);
         }
     });
 }
@@ -123,42 +94,31 @@ bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t si
 }
 
 bool Events::SetArchived(int id, bool archived) {
-    return connection_.Write([&](soci::session& sql) {
-        const int value = archived;
-        soci::statement change = (sql.prepare << "update events set archived = :archived where id = :id",
-                                  soci::use(value, "archived"), soci::use(id, "id"));
-        return Affects(change);
-    });
+    return connection_.Execute("update events set archived = :archived where id = :id", archived, id) > 0;
 }
 
 int Events::Remove(std::span<const int> ids) {
     return connection_.Write([&](soci::session& sql) {
         int id = 0;
         int removed = 0;
-        soci::statement removal = (sql.prepare << "delete from events where id = :id", soci::use(id, "id"));
+        soci::statement removal = Prepare(sql, kRepeatedly, "delete from events where id = :id", id);
         for (const int next : ids) {
             id = next;
-            removed += Affects(removal) ? 1 : 0;
+            removed += Run(removal);
         }
         return removed;
     });
 }
 
 int Events::RemoveDemo() {
-    long long removed = 0;
+    int removed = 0;
     for (const char* statement : {"delete from events where id in (select id from events where demo = 1 limit :limit)",
                                   "delete from marks where id in (select id from marks where demo = 1 limit :limit)"}) {
-        long long some = 0;
-        do {
-            some = connection_.Write([&](soci::session& sql) {
-                soci::statement removal = (sql.prepare << statement, soci::use(kRowsAtOnce, "limit"));
-                removal.execute(true);
-                return removal.get_affected_rows();
-            });
+        while (const int some = connection_.Execute(statement, kRowsAtOnce)) {
             removed += some;
-        } while (some > 0);
+        }
     }
-    return static_cast<int>(removed);
+    return removed;
 }
 
 }  // namespace lookhaven::store

@@ -39,10 +39,12 @@ struct Event {
     int height = 0;
     std::string path;       // relative to the mount
     bool archived = false;  // retention leaves it alone
-    bool demo = false;      // made up for a trial: there is no file
+    bool demo = false;      // demo data: there is no file
+
+    friend bool operator==(const Event&, const Event&) = default;
 };
 
-// Which events to read; a fresh one names those of no camera.
+// Which events to read: by default none, since no camera is named.
 struct EventFilter {
     std::set<int> camera_ids;
     int mount_id = 0;                                               // 0: any
@@ -55,7 +57,7 @@ struct EventFilter {
     int limit = std::numeric_limits<int>::max();
 };
 
-// What lies on a mount, trials left out.
+// What a mount holds, without demo events.
 struct MountContent {
     std::int64_t events = 0;
     std::int64_t size_bytes = 0;
@@ -68,38 +70,39 @@ class Events {
     // The store must outlive this object.
     explicit Events(Store& store) : connection_(store.connection()) {}
 
-    // The id of an event or mark to come; one that is not used is lost.
+    // Reserves the id of a future event; one that is not used is lost.
     int NextId();
-    // The first of so many ids in a row; for the recorder, which must be able to begin events while the store is away.
+    // The first of that many consecutive ids; for the recorder, which must be able to begin events while the store is away.
     int NextIds(int count);
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.
     void Begin(const Event& event);
-    // Stores finished rows under ids of their own, in one transaction.
+    // Stores finished rows under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(std::span<const Event> events);
-    // The event goes on. end_s: its last second on the mount. These three are false when there is no such row, and throw
-    // InvalidRecord where the event would end before it starts or become too long.
+    // end_s: the event's last second on the mount. These three are false when there is no such row; the first two throw
+    // InvalidRecord where the event would end before it starts or become too long. A power cut may lose a Grow that has
+    // returned, never a Finish.
     bool Grow(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
     bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
     bool SetArchived(int id, bool archived);
 
-    // The number of rows removed; the caller then removes the files.
+    // In one transaction; returns the number of rows removed. The caller then removes the files.
     int Remove(std::span<const int> ids);
-    // Removes all events and marks that were made up for a trial; returns how many.
+    // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call removes.
     int RemoveDemo();
 
     std::optional<Event> Find(int id);
-    // By start and id, over all of the filter's cameras.
+    // By start and id, across all of the filter's cameras.
     std::vector<Event> List(const EventFilter& filter);
     // The same rows without offset and limit, camera by camera, as they come from the store: nothing is collected. The
     // event is borrowed for the call, and the visitor must not use this store.
     void Visit(const EventFilter& filter, const Visitor& visitor);
 
-    // Those that are still marked as being written; after a crash, what has to be closed. By id.
+    // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();
-    // Finished events of the mount that are neither archived nor a trial's, the oldest start first.
+    // Finished events of the mount that are neither archived nor demo, the oldest start first.
     std::vector<Event> Oldest(int mount_id, int limit);
-    // Every row of the mount but a trial's, by camera and id. As Visit.
+    // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.
     MountContent Content(int mount_id);

@@ -19,7 +19,7 @@ struct CameraGroup {
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) Whoever loses a camera by a change of a group that is denied to him loses his sessions with it.
+//               (2) A change that adds a camera to a group ends the sessions of the users to whom the group is denied.
 class Groups {
   public:
     // The store must outlive this object.

@@ -10,7 +10,7 @@
 
 namespace lookhaven::store {
 
-// Use: Enter before the password is looked at, Clear once it was right.
+// Use: Enter before the password is checked, Clear after it was right.
 //
 // Why so        An attempt counts as failed from its start, else a hundred attempts at once would all pass the check
 //               before the first of them failed.
@@ -19,7 +19,7 @@ class LoginThrottle {
     // The store must outlive this object.
     explicit LoginThrottle(Store& store) : connection_(store.connection()) {}
 
-    // 0: go on. Otherwise the seconds after which the next attempt may be made; the password must not be looked at
+    // 0: go on. Otherwise the seconds after which the next attempt may be made; the password must not be checked
     // then. Account and address may hold any bytes; the account need not exist.
     int Enter(std::string_view account, std::string_view address, std::int64_t now_s);
 

@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Marks: alarms reported by a device, sales reported by a till. Their footage is a span of a camera's recordings.
+// Marks: alarms reported by a device, transactions reported by a POS terminal. Their footage is a span of a camera's
+// recordings.
 //
-// Why so        Whoever reports one may not wait for the footage, which is complete only after the post-record time. So a
+// Why so        Whoever reports one must not wait for the footage, which is complete only after the post-record time. So a
 //               mark is stored at once as pending, and the recorder, which owns the mounts, writes the span file.
 #pragma once
 
@@ -36,14 +37,16 @@ struct Mark {
     std::int64_t moment_s = 0;  // when it happened
     std::int64_t start_s = 0;   // the footage: with the camera's time before …
     std::int64_t end_s = 0;     // … and after
-    std::string text;           // lines divided by "\n"; what the till printed, or what the alarm said
+    std::string text;           // lines separated by "\n": the receipt, or what the alarm said
     MarkState state = MarkState::kPending;
     int mount_id = 0;  // these two once it is saved
     std::string path;  // of the span file, relative to the mount
     bool demo = false;
+
+    friend bool operator==(const Mark&, const Mark&) = default;
 };
 
-// Which marks to read; a fresh one names those of no camera.
+// Which marks to read: by default none, since no camera is named.
 struct MarkFilter {
     std::set<int> camera_ids;
     std::optional<MarkKind> kind;
@@ -63,10 +66,10 @@ class Marks {
     // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
     // characters but line ends. Throws InvalidRecord, or NotFound for an unknown camera.
     Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text);
-    // Stores rows as they are, under ids of their own.
+    // Stores rows as they are but under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(const std::vector<Mark>& marks);
 
-    // These are false when there is no such mark.
+    // These are false when there is no such mark. Save throws InvalidRecord for a path that is no text.
     bool Save(int id, int mount_id, const std::string& path);
     bool Miss(int id);
     bool Remove(int id);
@@ -74,12 +77,12 @@ class Marks {
     std::optional<Mark> Find(MarkKind kind, int id);
     // By start and id.
     std::vector<Mark> List(const MarkFilter& filter);
-    // The recorder's work, by the end of the span. Costs nothing when there is none.
+    // What the recorder has to save, by the end of the span. Costs nothing when there is none.
     std::vector<Mark> Pending();
-    // Marks of the camera whose footage ended at or before that time, the oldest first; a trial's and pending ones left
-    // out. What retention removes once it has removed the footage.
+    // Marks of the camera whose footage ended at or before that time, the oldest first, without demo and pending ones:
+    // what retention removes once it has removed the footage.
     std::vector<Mark> EndedBy(int camera_id, std::int64_t time_s, int limit);
-    // Every saved mark of the mount but a trial's, by id.
+    // Every saved mark of the mount but demo ones, by id.
     std::vector<Mark> OnMount(int mount_id);
 
   private:

@@ -32,11 +32,12 @@ class Mounts {
     // Stores the record under a new id, which it returns; the first mount becomes the default. Does not look at the
     // folder. Throws InvalidRecord or AlreadyExists.
     int Add(const Mount& mount);
-    // Replaces the record of mount.id; is_default can be given, not taken. Throws InvalidRecord or NotFound.
+    // Replaces the record of mount.id; is_default can be set, not cleared. Throws InvalidRecord or NotFound.
     void Update(const Mount& mount);
-    // Forgets the mount; its files stay. Throws NotFound, and InvalidRecord for the default while there are others, for
-    // a mount that a camera's plan names, and, unless forget_events, for one that holds events or saved marks; else
-    // their rows go too.
+    // Removes the record; the files stay. forget_events: removes the mount's events and saved marks first, in several
+    // transactions, so that some may be gone when it throws StoreError; call it again. Throws NotFound; InvalidRecord for the
+    // default while there are others, for a mount that a camera's plan names, and, without forget_events, for one that holds
+    // events or saved marks.
     void Remove(int id, bool forget_events);
 
     std::optional<Mount> Find(int id);

@@ -9,14 +9,14 @@
 
 namespace lookhaven::store {
 
-// The numbers are stored. A camera that is never recorded still is around its marks.
+// The numbers are stored. With kNever a camera is still recorded around its marks.
 enum class RecordMode : int { kNever = 0, kAlways = 1 };
 
 constexpr int kMinSegmentSeconds = 10;
 constexpr int kMaxSegmentSeconds = 3600;
 constexpr int kMaxAroundMarkSeconds = 300;
 
-// A camera without a plan of its own has a fresh one.
+// A camera without a plan of its own has this default.
 struct RecordingPlan {
     RecordMode mode = RecordMode::kNever;
     int segment_s = 300;  // kMinSegmentSeconds … kMaxSegmentSeconds

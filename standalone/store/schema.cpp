@@ -52,7 +52,7 @@ constexpr const char* kRecordings[] = {
     " archived integer not null, demo integer not null)",
     "create index events_by_start on events (camera_id, start_s)",
     "create index events_by_mount on events (mount_id, camera_id, id)",
-    // Partial, so that an event that grows or is made up costs nothing here. With the size, so that the sum of a mount is
+    // Partial, so that growing and demo events cost nothing here. With the size, so that the sum of a mount is
     // read from the index alone.
     "create index events_by_age on events (mount_id, start_s, size_bytes)"
     " where recording = 0 and archived = 0 and demo = 0",

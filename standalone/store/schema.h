@@ -3,7 +3,7 @@
 // The steps that lead from an empty store to this program's schema, the same for both engines.
 //
 // Invariants    (1) A step that was ever released is never changed; a new need is a new step at the end.
-//               (2) Columns are never null, so that no reader has to ask.
+//               (2) Columns are never null, so that no reader has to check.
 #pragma once
 
 #include <span>

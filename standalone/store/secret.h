@@ -10,10 +10,10 @@
 
 namespace lookhaven::store {
 
-// argon2id with salt and costs inside the text. Throws std::bad_alloc when 64 MiB are not to be had.
+// argon2id, with salt and cost parameters in the text. Throws std::bad_alloc when 64 MiB are not available.
 std::string HashPassword(std::string_view password);
 
-// No hash: the answer is no, at the price of a real look.
+// Without a hash false, after the same work as with one: how long it takes must not tell whether an account exists.
 bool PasswordMatches(const std::optional<std::string>& hash, std::string_view password);
 
 // That many bytes from the operating system's generator, two hex digits each.

@@ -15,7 +15,7 @@ namespace lookhaven::store {
 struct RecordingServer {
     int id = 0;                    // from 1, never used twice
     std::string name = {};         // UTF-8, 1 to 64 bytes, no other server's
-    std::string address = {};      // a host name or address; empty when only that host asks this one
+    std::string address = {};      // a host name or address; empty for a peer that connects to this host
     int port = 0;                  // of its web server; 0 with an empty address
     std::string certificate = {};  // PEM, what its web server must show; given with an address
     bool enabled = true;
@@ -32,7 +32,7 @@ struct RemoteCamera {
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) A secret comes out of AskersSecrets and FindSecret alone, never with the record.
+//               (2) A secret comes out of InboundPeerSecrets and FindSecret alone, never with the record.
 class RecordingServers {
   public:
     // The store must outlive this object.
@@ -43,7 +43,7 @@ class RecordingServers {
     int Add(const RecordingServer& server, const std::string& secret);
     // Replaces the record of server.id, the secret when one is given. Throws as Add, and NotFound.
     void Update(const RecordingServer& server, const std::optional<std::string>& secret = {});
-    // Removes the server and what is known of its cameras and devices. Throws NotFound.
+    // Removes the server with its cameras and devices; their ids are not used again. Throws NotFound.
     void Remove(int id);
 
     std::optional<RecordingServer> Find(int id);
@@ -51,12 +51,12 @@ class RecordingServers {
 
     // Empty for an unknown or disabled server.
     std::string FindSecret(int id);
-    // Of the enabled servers that ask this host, which are those without an address. What this host shows to a server that it
-    // asks itself lets nobody in here.
-    std::vector<std::string> AskersSecrets();
+    // Of the enabled servers without an address: peers that connect to this host. The secret of a server that this host
+    // connects to admits nobody here.
+    std::vector<std::string> InboundPeerSecrets();
 
-    // Gives the server's camera an id on this host, or renews what is known of one that has it; returns the id. Throws
-    // NotFound for an unknown server, InvalidRecord.
+    // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored. Returns
+    // the id. Throws InvalidRecord, or NotFound for an unknown server.
     int PutCamera(const RemoteCamera& camera);
     // Throws NotFound.
     void RemoveCamera(int id);

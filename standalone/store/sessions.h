@@ -52,7 +52,7 @@ class Sessions {
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
 
-    // Notes that the session is in use and moves its end. Writes at most once a minute; true when it wrote.
+    // Records that the session is in use and postpones its end. Writes at most once a minute; true when it wrote.
     bool Touch(const Session& session, std::int64_t now_s);
 
     // False when there was no such session.

@@ -16,14 +16,9 @@ namespace {
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
-    if (!connection.HasTable("schema_version")) {
-        return 0;
-    }
-    return connection.Read([](soci::session& sql) {
-        int version = 0;
-        sql << "select version from schema_version", soci::into(version);
-        return version;
-    });
+    return connection.HasTable("schema_version")
+               ? connection.FetchOne<int>("select version from schema_version").value()
+               : 0;
 }
 
 [[noreturn]] void ThrowNewer(int version) {
@@ -55,13 +50,9 @@ void PrepareFile(const StoreAddress& address) {
     } catch (const std::system_error& error) {
         throw StoreError(error.what());
     }
-    Connection(address).Read([](soci::session& sql) {
-        std::string mode;
-        sql << "pragma journal_mode = wal", soci::into(mode);
-        if (mode != "wal") {
-            throw StoreError("the record store's folder does not allow a write-ahead log: use a local file system");
-        }
-    });
+    if (Connection(address).FetchOne<std::string>("pragma journal_mode = wal") != "wal") {
+        throw StoreError("the record store's folder does not allow a write-ahead log: use a local file system");
+    }
 }
 
 int TakeSteps(soci::session& sql, int version) {
@@ -77,7 +68,7 @@ int TakeSteps(soci::session& sql, int version) {
         ++steps;
     }
     const int reached = version + steps;
-    sql << "update schema_version set version = :version", soci::use(reached, "version");
+    Execute(sql, "update schema_version set version = :version", reached);
     return steps;
 }
 
@@ -117,29 +108,21 @@ int Store::Migrate(const std::string& url) {
 }
 
 std::vector<std::string> Store::Check() {
-    return connection_->Read([this](soci::session& sql) {
-        std::vector<std::string> findings;
-        std::string text;
-        if (connection_->IsSqlite()) {
-            soci::statement check = (sql.prepare << "pragma integrity_check", soci::into(text));
-            check.execute();
-            while (check.fetch()) {
-                if (text != "ok") {
-                    findings.push_back("the record store is damaged: " + text + "; restore it from a backup");
-                }
+    std::vector<std::string> findings;
+    if (connection_->IsSqlite()) {
+        for (const std::string& text : connection_->FetchAll<std::string>("pragma integrity_check")) {
+            if (text != "ok") {
+                findings.push_back("the record store is damaged: " + text + "; restore it from a backup");
             }
         }
-        int camera = 0;
-        soci::statement lame = (sql.prepare << "select id from cameras where not exists (select 1 from camera_profiles"
-                                               " where camera_id = cameras.id and number = live_profile) order by id",
-                                soci::into(camera));
-        lame.execute();
-        while (lame.fetch()) {
-            findings.push_back("camera " + std::to_string(camera) +
-                               " has no source for its live view: set one with lookhaven camera set");
-        }
-        return findings;
-    });
+    }
+    for (const int camera :
+         connection_->FetchAll<int>("select id from cameras where not exists (select 1 from camera_profiles"
+                                    " where camera_id = cameras.id and number = live_profile) order by id")) {
+        findings.push_back("camera " + std::to_string(camera) +
+                           " has no source for its live view: set one with lookhaven camera set");
+    }
+    return findings;
 }
 
 }  // namespace lookhaven::store

@@ -1,14 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One connection to the record store: users, sessions, cameras, settings.
+// One connection to the record store: accounts, cameras, recorded events, e-maps and all else that is kept as records.
 //
 // Why so        A request process opens the store, asks a few questions and closes it, so opening is cheap and does no
 //               more than check that the schema is the one this program knows. SQLite and PostgreSQL take the same
-//               statements; what differs stands in connection.cpp alone.
+//               statements; connection.cpp and store.cpp hold the differences.
 // Thread safety One Store per thread. Any number of processes. A Store must not be used across fork().
-// See           users.h, sessions.h, cameras.h, settings.h, login_throttle.h: the records and what can be asked of
-// them.
-//               Every time is UTC seconds since the epoch and comes from the caller.
+// Failures      Besides what its declaration names, every function of a record class throws StoreError. Whatever it throws,
+//               a change is made whole or not at all, unless its declaration says otherwise. Times are UTC seconds since the epoch and come from the caller.
+// See           cameras.h, events.h, users.h and the other headers of this folder: a class for each kind of record.
 #pragma once
 
 #include <memory>
@@ -18,7 +18,9 @@
 
 namespace lookhaven::store {
 
-// The store cannot be reached, or failed while it was asked.
+// The store cannot be reached, failed, or was locked by other writers for five seconds. A change that failed so was not made,
+// unless the connection broke during its commit: look before repeating an Add. A Store that has lost its server stays
+// broken: open another one.
 class StoreError : public std::runtime_error {
   public:
     using std::runtime_error::runtime_error;
@@ -30,7 +32,7 @@ class SchemaError : public StoreError {
     using StoreError::StoreError;
 };
 
-// The caller's record breaks a rule (a name, a source, a level); nothing was changed. The text names the rule.
+// The caller's record breaks a rule, which the text names; nothing was changed.
 class InvalidRecord : public std::invalid_argument {
   public:
     using std::invalid_argument::invalid_argument;
@@ -73,8 +75,7 @@ class Store {
     Store& operator=(Store&&) noexcept;
     ~Store();
 
-    // What is wrong with the stored data, a sentence each; empty when it is sound. Takes time in proportion to the
-    // store.
+    // What is wrong with the stored data, a sentence each; empty when it is sound. Reads all of a SQLite file.
     std::vector<std::string> Check();
 
     // For the record classes of this folder.

@@ -20,11 +20,6 @@ bool IsAsciiLetterOrDigit(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
 }
 
-bool HasHostWithoutUser(std::string_view rest) {
-    const std::string_view authority = rest.substr(0, rest.find_first_of("/?#"));
-    return !authority.empty() && authority.find('@') == std::string_view::npos;
-}
-
 }  // namespace
 
 bool IsPlainText(std::string_view text, std::size_t max_bytes) {
@@ -54,16 +49,18 @@ bool IsAccountName(std::string_view name) {
 }
 
 bool IsSource(std::string_view source) {
-    if (!IsPlainText(source, kMaxSourceBytes)) {
+    const std::size_t colon = source.find_first_not_of("abcdefghijklmnopqrstuvwxyz0123456789+-.");
+    if (!IsPlainText(source, kMaxSourceBytes) || colon == 0 || colon == source.npos || source[colon] != ':') {
         return false;
     }
-    for (const std::string_view scheme : {"rtsp://", "http://", "https://"}) {
-        if (source.starts_with(scheme)) {
-            return source.find_first_of(" \\") == std::string_view::npos &&
-                   HasHostWithoutUser(source.substr(scheme.size()));
-        }
+    const std::string_view rest = source.substr(colon + 1);
+    if (!rest.starts_with("//")) {
+        return !rest.empty();
     }
-    return (source.starts_with("file:") || source.starts_with("test:")) && source.size() > 5;
+    const std::string_view host = rest.substr(2, rest.find_first_of("/?#", 2) - 2);
+    // Without a host it is a file's path, which may hold spaces.
+    return rest.size() > 2 && host.find('@') == host.npos &&
+           (host.empty() || source.find_first_of(" \\") == source.npos);
 }
 
 bool IsHex(std::string_view text, std::size_t digits) {

@@ -17,7 +17,7 @@ bool IsAccountName(std::string_view name);
 // The host's own name in the module's admission check: an account of that name would pass it.
 bool IsReservedName(std::string_view name);
 
-// An address that a camera's stream may come from, without account and password inside.
+// The form of a stream's address: "<scheme>:<rest>", without account and password before its host. Any scheme will do.
 bool IsSource(std::string_view source);
 
 bool IsHex(std::string_view text, std::size_t digits);

@@ -42,7 +42,7 @@ struct VerifiedUser : User {
 
 // Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
 //                   So does one of a group that is denied.
-//               (2) Names are told apart without regard to case, and "Lookhaven" is nobody's name.
+//               (2) Names are compared without regard to case; no account is called "Lookhaven".
 class Users {
   public:
     // The store must outlive this object.
@@ -52,7 +52,8 @@ class Users {
     // Takes a tenth of a second and 64 MiB, as does every use of a password. Throws InvalidRecord or AlreadyExists.
     User Add(std::string_view name, std::string_view password, Privilege privilege);
 
-    // The account when name and password are right. An unknown name takes as long as a wrong password.
+    // The account when name and password are right. An unknown name costs as much as a wrong password. A lack of those 64 MiB
+    // counts as a wrong one.
     std::optional<VerifiedUser> CheckPassword(std::string_view name, std::string_view password);
 
     std::optional<User> Find(int id);

@@ -130,7 +130,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
 
 TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     Pass(2);
-    EXPECT_EQ(recorder_.State(), RecordingState::kNoNumber) << "the store has not been there yet";
+    EXPECT_EQ(recorder_.State(), RecordingState::kNoEventId) << "the store has not been there yet";
     OpenStore();
     const auto is_recorded_again = [&] {
         fed_ = 0;

@@ -1,13 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps, their pictures and devices, and the hosts that this one is paired with.
+// E-maps, the devices on them, and the hosts that this one is paired with.
 #include "standalone/store/emaps.h"
 
-#include <fstream>
-
 #include "standalone/store/devices.h"
-#include "standalone/store/emap_pictures.h"
-#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
@@ -26,7 +22,6 @@ const std::string kCertificate = "-----BEGIN CERTIFICATE-----\nAA==\n-----END CE
 
 class EmapTest : public StoreTest {
   protected:
-    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
     int AddMap(const std::string& name) { return emaps_.Add({.name = name}); }
     int AddServer(const std::string& name = "Annex") {
         return servers_.Add({.name = name, .address = "192.0.2.7", .port = 8443, .certificate = kCertificate}, kSecret);
@@ -37,7 +32,6 @@ class EmapTest : public StoreTest {
     Emaps emaps_{store_};
     Devices devices_{store_};
     RecordingServers servers_{store_};
-    EmapPictures pictures_{store_, folder_};
 };
 
 TEST_P(EmapTest, ItemsComeBackAsTheyWerePutAndOnlyOnTopOfWhatWasRead) {
@@ -71,11 +65,7 @@ TEST_P(EmapTest, WhatBreaksARuleChangesNothing) {
     AddCamera();
     const EmapItem good{.device_id = 1};
     Replace(map, {good});
-    const auto with = [&](auto member, auto value) {
-        EmapItem item = good;
-        item.*member = value;
-        return item;
-    };
+    const auto with = [&](auto member, auto value) { return With(good, member, value); };
     for (const EmapItem& item :
          {with(&EmapItem::type, EmapItemType(5)), with(&EmapItem::type, EmapItemType(-1)),
           with(&EmapItem::name, std::string(256, 'n')), with(&EmapItem::name, std::string("a\nb")),
@@ -120,62 +110,6 @@ TEST_P(EmapTest, TwoEditorsCannotUndoEachOther) {
     EXPECT_THAT(emaps_.Items(map), SizeIs(saved.load())) << "each that was told \"saved\" is there";
 }
 
-TEST_P(EmapTest, PicturesAreKnownByWhatTheyHold) {
-    const struct {
-        std::string bytes;
-        std::string_view type;
-    } rows[] = {
-        {"\x89PNG\r\n\x1a\n....", "png"},
-        {"\xff\xd8\xff\xe0..", "jpg"},
-        {std::string("RIFF\0\0\0\0WEBPVP8 ", 16), "webp"},
-        {std::string("RIFF\0\0\0\0WAVEfmt ", 16), ""},
-        {"<svg/>", "svg"},
-        {"\xef\xbb\xbf<?xml version=\"1.0\"?>\n<!-- a -->\n<!DOCTYPE svg PUBLIC \"a\" \"b\">\n<svg width=\"1\">",
-         "svg"},
-        {"<!DOCTYPE svg [<!ENTITY a \"b\">]><svg>", ""},
-        {"<svgx>", ""},
-        {"<svg", ""},
-        {"<!-- <svg>", ""},
-        {"<?xml", ""},
-        {"<html><svg>", ""},
-        {"GIF89a", ""},
-        {"", ""}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(PictureType(row.bytes), row.type) << row.bytes;
-    }
-}
-
-TEST_P(EmapTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
-    const int map = AddMap("Ground floor");
-    pictures_.Put(map, "<svg/>");
-    const std::string first = emaps_.Find(map)->image;
-    EXPECT_EQ(pictures_.Read(first), "<svg/>");
-    EXPECT_THROW(pictures_.Put(map, "MZ"), InvalidRecord);
-    EXPECT_THROW(pictures_.Put(map, "<svg>" + std::string(kMaxEmapPictureBytes, ' ')), InvalidRecord);
-    EXPECT_THROW(pictures_.Put(99, "<svg/>"), NotFound);
-    EXPECT_EQ(emaps_.Find(map)->image, first);
-    namespace fs = std::filesystem;
-    const auto make_old = [&] {
-        fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
-    };
-    make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
-    EXPECT_NE(emaps_.Find(map)->image, first);
-    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "whoever has just been told of it";
-    make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
-    EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
-
-    std::ofstream(folder_ / "secret.svg") << "<svg/>";
-    const std::string ours = "1-0123456789abcdef.svg";
-    fs::create_symlink(folder_ / "secret.svg", folder_ / "emaps" / ours);
-    for (const std::string& name :
-         {ours, std::string("../secret.svg"), std::string("1-0123456789abcdef.png"), std::string("."), std::string(),
-          "/" + ours, std::string("1-0123456789abcde/.svg"), ours + std::string("\0x", 2), first}) {
-        EXPECT_THROW(pictures_.Read(name), std::system_error) << name;
-    }
-}
-
 TEST_P(EmapTest, DevicesKeepTheirPortsAndTheIdsTheyHaveElsewhere) {
     const int camera = AddCamera();
     const int server = AddServer();
@@ -194,16 +128,19 @@ TEST_P(EmapTest, DevicesKeepTheirPortsAndTheIdsTheyHaveElsewhere) {
     devices_.Update(module);
     EXPECT_EQ(devices_.Find(EmapItemType::kIoModule, module.id)->server_id, server) << "a device changes no owner";
     EXPECT_THAT(devices_.Find(EmapItemType::kIoModule, module.id)->ports, SizeIs(1));
-    const auto refused = [&](Device device) { devices_.Add(device); };
-    EXPECT_THROW(refused({.kind = EmapItemType::kCamera, .name = "a"}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = ""}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .ports = {{0, {}}}}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kDoor, .name = "a", .server_id = server, .id_on_server = 1}),
-                 InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kIoModule, .name = "a", .ports = {{64, {}}}}), InvalidRecord);
-    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .server_id = 99, .id_on_server = 1}), NotFound);
-    EXPECT_THROW(refused({.kind = EmapItemType::kPos, .name = "a", .camera_id = 99}), NotFound);
-
+    for (const Device& device : std::initializer_list<Device>{
+             {.kind = EmapItemType::kCamera, .name = "a"},
+             {.kind = EmapItemType::kDoor, .name = ""},
+             {.kind = EmapItemType::kDoor, .name = "a", .ports = {{0, {}}}},
+             {.kind = EmapItemType::kDoor, .name = "a", .server_id = server, .id_on_server = 1},
+             {.kind = EmapItemType::kIoModule, .name = "a", .ports = {{64, {}}}}}) {
+        EXPECT_THROW(devices_.Add(device), InvalidRecord) << static_cast<int>(device.kind);
+    }
+    for (const Device& device :
+         std::initializer_list<Device>{{.kind = EmapItemType::kPos, .name = "a", .server_id = 99, .id_on_server = 1},
+                                       {.kind = EmapItemType::kPos, .name = "a", .camera_id = 99}}) {
+        EXPECT_THROW(devices_.Add(device), NotFound) << device.server_id;
+    }
     devices_.SetCameraPorts(remote, {2, 1});
     EXPECT_EQ(devices_.CameraPorts().at(remote).inputs, 2);
     EXPECT_THROW(devices_.SetCameraPorts(99, {1, 1}), NotFound);
@@ -252,13 +189,13 @@ TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
-    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is asked has nothing to ask here";
-    RecordingServer asker{.name = "Asks only"};
-    asker.id = servers_.Add(asker, kSecret);
-    EXPECT_THAT(servers_.AskersSecrets(), ElementsAre(kSecret));
-    asker.enabled = false;
-    servers_.Update(asker);
-    EXPECT_THAT(servers_.AskersSecrets(), IsEmpty()) << "one that is switched off gets no answer";
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "a server that this host connects to";
+    RecordingServer peer{.name = "Connects to this host"};
+    peer.id = servers_.Add(peer, kSecret);
+    EXPECT_THAT(servers_.InboundPeerSecrets(), ElementsAre(kSecret));
+    peer.enabled = false;
+    servers_.Update(peer);
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "disabled";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;
     servers_.Update(changed, std::string(64, 'b'));
@@ -270,17 +207,16 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     for (const std::string& secret : {std::string(), std::string(63, 'a'), std::string(64, 'g')}) {
         EXPECT_THROW(servers_.Add(good, secret), InvalidRecord) << secret;
     }
-    for (const char* address : {"a b", "a;b", "a/b", "a}b", "a\n", "-a", "a$b"}) {
-        EXPECT_THROW(servers_.Add({.name = "B", .address = address, .port = 1, .certificate = kCertificate}, kSecret),
-                     InvalidRecord)
-            << address;
+    const auto with = [&](auto member, auto value) { return With(good, member, value); };
+    constexpr auto kAddress = &RecordingServer::address;
+    constexpr auto kPort = &RecordingServer::port;
+    constexpr auto kPem = &RecordingServer::certificate;
+    for (const RecordingServer& bad :
+         {with(kAddress, "a b"), with(kAddress, "a;b"), with(kAddress, "a/b"), with(kAddress, "a}b"),
+          with(kAddress, "a\n"), with(kAddress, "-a"), with(kAddress, "a$b"), with(kPort, 65536), with(kPort, 0),
+          with(kPem, "x"), with(kPem, "")}) {
+        EXPECT_THROW(servers_.Add(bad, kSecret), InvalidRecord) << bad.address << bad.port << bad.certificate;
     }
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 65536, .certificate = kCertificate}, kSecret),
-                 InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 0, .certificate = kCertificate}, kSecret),
-                 InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1, .certificate = "x"}, kSecret), InvalidRecord);
-    EXPECT_THROW(servers_.Add({.name = "B", .address = "a", .port = 1}, kSecret), InvalidRecord) << "in the clear";
     EXPECT_THROW(AddServer(), AlreadyExists);
     const int id = servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "Old"});
     EXPECT_EQ(servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "New"}), id);
@@ -289,38 +225,6 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(EmapTest);
-
-TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
-    constexpr std::int64_t kNow = 1'800'000'000;
-    const std::string now = "1800000000";
-    const std::string token = MakePairToken(kSecret, now);
-    std::string flipped = token;
-    flipped.back() = flipped.back() == '0' ? '1' : '0';
-    const struct {
-        std::string token, timestamp, secret;
-        std::int64_t at;
-        bool matches;
-    } rows[] = {{token, now, kSecret, kNow, true},
-                {token, now, kSecret, kNow + 300, true},
-                {token, now, kSecret, kNow - 300, true},
-                {token, now, kSecret, kNow + 301, false},
-                {token, now, kSecret, kNow - 301, false},
-                {token, "1800000001", kSecret, kNow, false},
-                {token, now, std::string(64, 'b'), kNow, false},
-                {flipped, now, kSecret, kNow, false},
-                {token.substr(1), now, kSecret, kNow, false},
-                {token, now, "", kNow, false},
-                {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
-                {MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
-                {MakePairToken(kSecret, ""), "", kSecret, 0, false}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
-            << row.timestamp << " at " << row.at;
-    }
-    EXPECT_THROW(MakePairToken("", now), std::invalid_argument);
-}
 
 }  // namespace
 }  // namespace lookhaven::store

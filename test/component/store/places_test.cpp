@@ -18,8 +18,6 @@ using testing::IsEmpty;
 
 class PlaceTest : public StoreTest {
   protected:
-    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
-
     int AddMount(const std::string& name, const std::string& path) {
         Mount mount;
         mount.name = name;

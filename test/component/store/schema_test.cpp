@@ -98,7 +98,7 @@ TEST_P(EmptyStore, IsSetUpOnceByMany) {
 LOOKHAVEN_ON_BOTH_ENGINES(EmptyStore);
 
 TEST_P(StoreTest, CheckNamesACameraWithoutALiveSource) {
-    Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+    AddCamera();
     EXPECT_THAT(store_.Check(), IsEmpty());
     Force("delete from camera_profiles");
     EXPECT_THAT(store_.Check(), ElementsAre(HasSubstr("camera 1")));

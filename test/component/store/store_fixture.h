@@ -11,6 +11,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/store/cameras.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/store.h"
 #include "test/support/folder.h"
@@ -21,7 +22,7 @@ class EmptyStore : public testing::TestWithParam<Engine> {
   protected:
     EmptyStore();
 
-    // Looks or reaches behind the records' interface.
+    // Reads and writes past the records' classes.
     std::string Ask(const std::string& query);
     void Force(const std::string& statement);
 
@@ -29,17 +30,26 @@ class EmptyStore : public testing::TestWithParam<Engine> {
     std::string url_;
 };
 
+// A record of which one member is different.
+template <typename Record, typename Member, typename Value>
+Record With(Record record, Member Record::*member, Value value) {
+    record.*member = value;
+    return record;
+}
+
 class StoreTest : public EmptyStore {
   protected:
     StoreTest() : store_((Store::Migrate(url_), Store::Open(url_))) {}
 
-    // Runs the work at once on so many connections; a failure in any of them fails the test.
+    int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
+
+    // Runs the work on that many connections at once; a failure in any of them fails the test.
     void InParallel(int connections, const std::function<void(Store&)>& work);
 
     Store store_;
 };
 
-// A text with zeros, quotes and bytes that are no UTF-8, as requests bring them.
+// Texts with zeros, quotes and bytes that are not UTF-8, as requests may hold them.
 const std::vector<std::string> kHostileTexts = {"",
                                                 std::string("a\0b", 3),
                                                 "' or '1'='1",

@@ -10,16 +10,18 @@
 #include <string>
 #include <string_view>
 
-namespace lookhaven::store {
+#include "platform/export.h"
+
+namespace lookhaven::binding {
 
 // How far the two hosts' clocks, and a token's age, may be apart.
 constexpr std::int64_t kPairTokenWindowSeconds = 300;
 
 // secret: 64 hex digits, else std::invalid_argument is thrown.
-std::string MakePairToken(std::string_view secret, std::string_view timestamp);
+LH_PLATFORM_API std::string MakePairToken(std::string_view secret, std::string_view timestamp);
 
 // Whether the token was made with the secret for the timestamp, and the timestamp is within the window around now. False
 // for anything malformed, an empty secret too. Takes the same time whatever byte of the token is wrong.
-bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s);
+LH_PLATFORM_API bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s);
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::binding

@@ -9,12 +9,12 @@
 
 #include "standalone/store/emaps.h"
 
-namespace lookhaven::store {
+namespace lookhaven::emap {
 
-Json::Value ToJson(const std::vector<EmapItem>& items);
+Json::Value ToJson(const std::vector<store::EmapItem>& items);
 
-// Members that are missing have the record's defaults. Throws InvalidRecord for anything but a list of objects with whole
+// Members that are missing have the record's defaults. Throws store::InvalidRecord for anything but a list of objects with whole
 // numbers and a text; the numbers' bounds are the store's business.
-std::vector<EmapItem> EmapItemsFromJson(const Json::Value& list);
+std::vector<store::EmapItem> ItemsFromJson(const Json::Value& list);
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::emap

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/store/emap_pictures.h"
+#include "standalone/emap/pictures.h"
 
 #include <chrono>
 #include <set>
@@ -13,7 +13,7 @@
 #include "standalone/store/secret.h"
 #include "standalone/store/text.h"
 
-namespace lookhaven::store {
+namespace lookhaven::emap {
 
 namespace {
 
@@ -67,7 +67,8 @@ bool IsPictureName(std::string_view name) {
     }
     const std::string_view type = name.substr(dot + 1);
     return name.substr(0, dash).find_first_not_of("0123456789") == std::string_view::npos &&
-           IsHex(name.substr(dash + 1, 16), 16) && (type == "png" || type == "jpg" || type == "webp" || type == "svg");
+           store::IsHex(name.substr(dash + 1, 16), 16) &&
+           (type == "png" || type == "jpg" || type == "webp" || type == "svg");
 }
 
 }  // namespace
@@ -85,20 +86,20 @@ std::string_view PictureType(std::string_view bytes) {
     return IsSvg(bytes) ? "svg" : "";
 }
 
-void EmapPictures::Put(int emap_id, std::string_view bytes) {
-    if (bytes.size() > kMaxEmapPictureBytes) {
-        throw InvalidRecord("an e-map's picture has at most 16 MiB");
+void Pictures::Put(int emap_id, std::string_view bytes) {
+    if (bytes.size() > kMaxPictureBytes) {
+        throw store::InvalidRecord("an e-map's picture has at most 16 MiB");
     }
     const std::string_view type = PictureType(bytes);
     if (type.empty()) {
-        throw InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
+        throw store::InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
     }
-    Emaps emaps(store_);
-    const std::optional<Emap> before = emaps.Find(emap_id);
+    store::Emaps emaps(store_);
+    const std::optional<store::Emap> before = emaps.Find(emap_id);
     if (!before) {
-        throw NotFound("there is no e-map " + std::to_string(emap_id));
+        throw store::NotFound("there is no e-map " + std::to_string(emap_id));
     }
-    const std::string name = std::to_string(emap_id) + "-" + RandomHex(8) + "." + std::string(type);
+    const std::string name = std::to_string(emap_id) + "-" + store::RandomHex(8) + "." + std::string(type);
     fs::create_directories(folder_);
     base::WriteFileAtomically(folder_ / name, bytes);
     try {
@@ -114,9 +115,9 @@ void EmapPictures::Put(int emap_id, std::string_view bytes) {
     Sweep();
 }
 
-void EmapPictures::Sweep() {
+void Pictures::Sweep() {
     std::set<std::string> used;
-    for (const Emap& emap : Emaps(store_).List()) {
+    for (const store::Emap& emap : store::Emaps(store_).List()) {
         used.insert(emap.image);
     }
     std::error_code error;
@@ -129,7 +130,7 @@ void EmapPictures::Sweep() {
     }
 }
 
-std::string EmapPictures::Read(const std::string& name) const {
+std::string Pictures::Read(const std::string& name) const {
     if (!IsPictureName(name)) {
         throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is no picture of an e-map");
     }
@@ -137,7 +138,7 @@ std::string EmapPictures::Read(const std::string& name) const {
     const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
     struct stat about {};
     if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode) ||
-        static_cast<std::size_t>(about.st_size) > kMaxEmapPictureBytes) {
+        static_cast<std::size_t>(about.st_size) > kMaxPictureBytes) {
         throw std::system_error(EFBIG, std::generic_category(), path.string() + " is no picture file");
     }
     std::string bytes(static_cast<std::size_t>(about.st_size), '\0');
@@ -149,4 +150,4 @@ std::string EmapPictures::Read(const std::string& name) const {
     return bytes;
 }
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::emap

@@ -14,20 +14,20 @@
 
 #include "standalone/store/emaps.h"
 
-namespace lookhaven::store {
+namespace lookhaven::emap {
 
-constexpr std::size_t kMaxEmapPictureBytes = 16U << 20U;
+constexpr std::size_t kMaxPictureBytes = 16U << 20U;
 
 // "png", "jpg", "webp" or "svg"; empty for anything else. An SVG that declares entities is nothing of these.
 std::string_view PictureType(std::string_view bytes);
 
-class EmapPictures {
+class Pictures {
   public:
     // The store must outlive this object.
-    EmapPictures(Store& store, const std::filesystem::path& home) : store_(store), folder_(home / "emaps") {}
+    Pictures(store::Store& store, const std::filesystem::path& home) : store_(store), folder_(home / "emaps") {}
 
-    // Gives the map another picture; then removes the last one, and files that no map names. Throws InvalidRecord for
-    // what is no picture or larger than kMaxEmapPictureBytes, NotFound for an unknown map, std::system_error when it
+    // Gives the map another picture; then removes the last one, and files that no map names. Throws store::InvalidRecord for
+    // what is no picture or larger than kMaxPictureBytes, store::NotFound for an unknown map, std::system_error when it
     // cannot be written. After an error the map has its old picture.
     void Put(int emap_id, std::string_view bytes);
 
@@ -38,8 +38,8 @@ class EmapPictures {
     std::string Read(const std::string& name) const;
 
   private:
-    Store& store_;
+    store::Store& store_;
     std::filesystem::path folder_;
 };
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::emap
