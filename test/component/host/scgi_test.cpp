@@ -29,8 +29,9 @@ State FeedAll(ScgiParser& parser, std::string_view bytes, std::size_t step) {
 
 TEST(Scgi, TakesARequestHoweverItIsCut) {
     const std::string bytes = ScgiBytes({{"REQUEST_METHOD", "POST"}, {"EMPTY", ""}}, "name=value\0,:"s);
-    std::mt19937 random(1);
-    for (int round = 0; round < 200; ++round) {
+    for (std::mt19937::result_type seed = 0; seed < 200; ++seed) {
+        SCOPED_TRACE("seed " + std::to_string(seed));
+        std::mt19937 random(seed);
         ScgiParser parser;
         std::string_view rest = bytes;
         while (!rest.empty()) {
