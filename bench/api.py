@@ -16,7 +16,7 @@ def main():
     bin_folder = pathlib.Path(sys.argv[1])
     with Stand(bin_folder) as stand:
         for number in range(CAMERAS):
-            stand.add_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
+            stand.add_test_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
         stand.start_host()
         stand.start_nginx()
         cookie = stand.log_in()
@@ -24,7 +24,7 @@ def main():
         print("|---|---|---|---|---|---|")
         for name, target in (
             ("host, SCGI socket", ["--unix", stand.socket]),
-            ("host behind nginx", ["--port", str(stand.http_port)]),
+            ("host behind nginx", ["--port", str(stand.port)]),
         ):
             for clients in (1, 16):
                 output = subprocess.run(

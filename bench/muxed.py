@@ -7,25 +7,20 @@ view. The delay is from the time that the pattern shows (the light along its low
 animation frame after the drawing.
 """
 
-import os
 import pathlib
 import sys
 
-from stand import ROOT
+from stand import ROOT, Installation
 from viewing import Load, print_comparison
+from visit import Visit
 
 WATCH_SECONDS = 20
 
 
 def print_canvas_delays(build_folder):
-    os.environ["LOOKHAVEN_BUILD_FOLDER"] = str(build_folder)
-    sys.path.insert(0, str(ROOT / "test/system"))
-    from installation import Installation
-    from visit import Visit
-
     print("| camera 2 in Chromium | pictures/s | p50 ms | p95 ms | longest ms |")
     print("|---|---|---|---|---|")
-    with Installation() as server:
+    with Installation(LOOKHAVEN_BUILD_FOLDER=str(build_folder)) as server:
         address = f"https://localhost:{server.tls_port}/"
         with Visit("muxed.mjs", address, LOOKHAVEN_WATCH_MS=str(WATCH_SECONDS * 1000)) as visit:
             for name, step in ("sound off", "watched"), ("sound on", "heard"):

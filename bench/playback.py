@@ -66,7 +66,7 @@ class Player:
 
     def __init__(self, stand, cookie, **parameters):
         query = {"api": "VEXO.Lookhaven.Player", "version": 1, "method": "PlayMjpegEvent", "timestamp": 1, **parameters}
-        self._connection = http.client.HTTPConnection("127.0.0.1", stand.http_port, timeout=60)
+        self._connection = http.client.HTTPConnection("127.0.0.1", stand.port, timeout=60)
         self._connection.request(
             "GET", "/webapi?" + "&".join(f"{name}={value}" for name, value in query.items()), headers={"Cookie": f"id={cookie}"}
         )
@@ -150,7 +150,7 @@ def main():
     bin_folder = pathlib.Path(sys.argv[1])
     with Stand(bin_folder) as stand:
         for camera, codec in enumerate(CODECS, 1):
-            stand.add_camera(codec, "test:mjpeg")
+            stand.add_test_camera(codec, "test:mjpeg")
             record_hour(stand, camera, codec)
         events = stand.take_in_recordings()
         recorded = {

@@ -30,7 +30,7 @@ class Postgres:
             [PROGRAMS / "postgres", "-D", data, "-k", self._folder, "-c", "listen_addresses="],
             cwd=self._folder, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, **self._user,
         )
-        wait_until(lambda: "ready" in self._state(data / "postmaster.pid"), "PostgreSQL ready", 60)
+        wait_until(lambda: "ready" in self._state(data / "postmaster.pid"), 60, "PostgreSQL is ready")
         return self
 
     def __exit__(self, *_):

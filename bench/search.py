@@ -98,7 +98,7 @@ def measure(bin_folder, size, store=None, plant=None):
     answers = {}
     with Stand(bin_folder, store) as stand:
         for number in range(CAMERAS):
-            stand.add_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
+            stand.add_test_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
         stand.add_events(size, YEARS_DAYS)
         rows = planted_rows(10 * SIZES[-1])
         if plant is not None:

@@ -4,30 +4,13 @@
 import json
 import os
 import pathlib
-import shutil
 import signal
 import socket
 import subprocess
-import tempfile
-import time
+import sys
 
-ROOT = pathlib.Path(__file__).resolve().parent.parent
-PASSWORD = "bench-password"
-
-
-def children(pid):
-    found = []
-    for task in pathlib.Path(f"/proc/{pid}/task").iterdir():
-        found += [int(child) for child in (task / "children").read_text().split()]
-    return found
-
-
-def descendants(pid):
-    """The process's descendants, oldest first."""
-    found = []
-    for child in children(pid):
-        found += [child, *descendants(child)]
-    return sorted(found)
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
+from installation import PASSWORDS, ROOT, Installation, descendants, wait_until
 
 
 def cpu_nanos(pids):
@@ -57,74 +40,50 @@ def viewers(bin_folder, count, seconds, target):
     return result
 
 
-def free_port():
-    with socket.socket() as probe:
-        probe.bind(("127.0.0.1", 0))
-        return probe.getsockname()[1]
-
-
-def wait_until(condition, what, seconds=10):
-    deadline = time.monotonic() + seconds
-    while not condition():
-        if time.monotonic() > deadline:
-            raise TimeoutError(f"{what} did not happen within {seconds} s")
-        time.sleep(0.02)
-
-
-class Stand:
-    """Use as a context manager: everything started ends with it, and its folder goes."""
+class Stand(Installation):
+    """Use as a context manager: everything started ends with it, and its folder goes. Nothing runs until it is started:
+    the benchmark chooses host, web server and feeder instead of script/server's parts."""
 
     def __init__(self, bin_folder, store=None):
         """store: the address of a store other than SQLite's file."""
+        super().__init__(LOOKHAVEN_BUILD_FOLDER=str(bin_folder.parent))
         self._bin = bin_folder
-        self._home = pathlib.Path(tempfile.mkdtemp(prefix="lookhaven-bench-"))
-        self._environment = {**os.environ, "LOOKHAVEN_HOME": str(self._home)}
         self._processes = {}
-        self.http_port = free_port()
-        self.socket = str(self._home / "run" / "webapi.sock")
-        self.database = self._home / "lookhaven.db"
-        self.mount = self._home / "recordings"
+        self.socket = str(self.home / "run/webapi.sock")
+        self.database = self.home / "lookhaven.db"
+        self.mount = self.home / "recordings"
         try:
             if store is not None:
-                (self._home / "store").write_text(store + "\n")
-            self._run("init", "--admin", "admin", stdin=PASSWORD + "\n")
+                self.home.mkdir()
+                (self.home / "store").write_text(store + "\n")
+            self.cli("init", "--admin", "admin", text=PASSWORDS["admin"] + "\n")
         except BaseException:
-            shutil.rmtree(self._home)
+            self.discard()
             raise
 
-    def __enter__(self):
-        return self
+    def start(self):
+        pass
 
-    def __exit__(self, *_):
+    def stop(self, how=signal.SIGTERM):
         for process in reversed(self._processes.values()):
-            process.send_signal(signal.SIGTERM)
+            process.send_signal(how)
         for process in self._processes.values():
             process.wait(timeout=20)
-        shutil.rmtree(self._home)
-
-    def _run(self, *arguments, stdin=""):
-        subprocess.run(
-            [self._bin / "lookhaven", *arguments],
-            input=stdin, text=True, check=True, stdout=subprocess.DEVNULL, env=self._environment,
-        )
 
     def _start(self, name, *command):
-        log = open(self._home / "log" / f"{name}.log", "w")
-        self._processes[name] = subprocess.Popen(command, stdout=log, stderr=log, env=self._environment)
+        with open(self.home / "log" / f"{name}.log", "w") as log:
+            self._processes[name] = subprocess.Popen(command, stdout=log, stderr=log, env=self.environment)
 
-    def add_camera(self, name, source, video_type="mjpeg"):
-        self._run("camera", "add", "--name", name, "--type", video_type, "--source", source)
+    def add_test_camera(self, name, source, video_type="mjpeg"):
+        self.cli("camera", "add", "--name", name, "--type", video_type, "--source", source)
 
     def take_in_recordings(self):
         """Gives the recordings that lie on the mount rows and indexes; the event of each camera."""
-        self._run("verify", "--repair")
-        listed = subprocess.run(
-            [self._bin / "lookhaven", "event", "list", "--json"], check=True, capture_output=True, env=self._environment
-        ).stdout
-        return {event["camera_id"]: event["id"] for event in json.loads(listed)}
+        self.cli("verify", "--repair")
+        return {event["camera_id"]: event["id"] for event in json.loads(self.cli("event", "list", "--json"))}
 
     def add_events(self, count, days):
-        self._run("demo", "events", "--count", str(count), "--days", str(days))
+        self.cli("demo", "events", "--count", str(count), "--days", str(days), timeout=None)
 
     def start_feeder(self, camera, codec, frame_bytes, frames_per_second):
         self._start(
@@ -134,54 +93,46 @@ class Stand:
     def start_host(self):
         module = self._bin.parent / "lib" / "VEXO.Lookhaven.Player.so"
         self._start(
-            "webapi", self._bin / "lookhaven-webapi", "--home", self._home, "--socket", self.socket, "--module", module
+            "webapi", self._bin / "lookhaven-webapi", "--home", self.home, "--socket", self.socket, "--module", module
         )
-        wait_until(lambda: pathlib.Path(self.socket).exists(), "listening")
+        wait_until(pathlib.Path(self.socket).exists, 10, "the host listens")
 
     def start_nginx(self):
         """The project's own configuration, on ports of its own."""
         subprocess.run(
             ["openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:prime256v1", "-nodes",
-             "-subj", "/CN=bench", "-keyout", self._home / "tls/key.pem", "-out", self._home / "tls/certificate.pem"],
+             "-subj", "/CN=bench", "-keyout", self.home / "tls/key.pem", "-out", self.home / "tls/certificate.pem"],
             check=True, capture_output=True,
         )
-        self._run("server", "configure")
+        self.cli("server", "configure")
         configuration = (ROOT / "packaging/nginx/lookhaven.conf.in").read_text()
         for word, value in {
             "user": "user root root;" if os.geteuid() == 0 else "",
-            "home": self._home,
-            "client": self._home,
-            "port": self.http_port,
-            "tls_port": free_port(),
+            "home": self.home,
+            "client": self.home,
+            "port": self.port,
+            "tls_port": self.tls_port,
             "listen_v6": "",
         }.items():
             configuration = configuration.replace(f"@{word}@", str(value))
-        path = self._home / "run/nginx.conf"
+        path = self.home / "run/nginx.conf"
         path.write_text(configuration)
-        self._start("nginx", "/usr/sbin/nginx", "-p", self._home / "run", "-c", path)
-        wait_until(lambda: self._answers(), "nginx answering")
+        self._start("nginx", "/usr/sbin/nginx", "-p", self.home / "run", "-c", path)
+        wait_until(self._answers, 10, "nginx answers")
 
     def _answers(self):
         with socket.socket() as probe:
-            return probe.connect_ex(("127.0.0.1", self.http_port)) == 0
+            return probe.connect_ex(("127.0.0.1", self.port)) == 0
 
     def log_in(self):
         """The session cookie's value; needs the web server."""
-        answer = subprocess.run(
-            ["curl", "-s", "-i", f"http://127.0.0.1:{self.http_port}/webapi?api=VEXO.Auth&version=1&method=Login",
-             "--data-urlencode", "account=admin", "--data-urlencode", f"password={PASSWORD}"],
-            check=True, capture_output=True, text=True,
-        ).stdout
-        for line in answer.splitlines():
-            if line.lower().startswith("set-cookie: id="):
-                return line.split("=", 1)[1].split(";")[0]
-        raise RuntimeError("cannot log in: " + answer)
+        return self.session("admin")
 
     def host_processes(self):
         """The host and its request processes, oldest first."""
         host = self._processes["webapi"].pid
-        return [host, *descendants(host)]
+        return [host, *sorted(descendants(host))]
 
     def nginx_processes(self):
         nginx = self._processes["nginx"].pid
-        return [nginx, *descendants(nginx)]
+        return [nginx, *sorted(descendants(nginx))]

@@ -55,7 +55,7 @@ def bare_row(bin_folder, load, count):
         try:
             while not path.exists():
                 time.sleep(0.01)
-            return measure(bin_folder, load, count, ["--unix", path], lambda: descendants(server.pid)[1:])
+            return measure(bin_folder, load, count, ["--unix", path], lambda: sorted(descendants(server.pid))[1:])
         finally:
             server.kill()
             server.wait()
@@ -66,7 +66,7 @@ def print_comparison(bin_folder, load):
     print("|---|---|---|---|---|---|---|---|")
     with Stand(bin_folder) as stand:
         video_type = load.codec.lower()
-        stand.add_camera("Bench", f"test:{video_type}?size=1280x720&fps={load.frames_per_second}", video_type)
+        stand.add_test_camera("Bench", f"test:{video_type}?size=1280x720&fps={load.frames_per_second}", video_type)
         stand.start_feeder(1, load.codec, load.frame_bytes, load.frames_per_second)
         stand.start_host()
         stand.start_nginx()
@@ -75,7 +75,7 @@ def print_comparison(bin_folder, load):
             ("host, SCGI socket", ["--unix", stand.socket, *cookie], stand.host_processes),
             (
                 "host behind nginx",
-                ["--port", str(stand.http_port), *cookie],
+                ["--port", str(stand.port), *cookie],
                 lambda: stand.nginx_processes() + stand.host_processes(),
             ),
         ]

@@ -15,22 +15,40 @@ if(LOOKHAVEN_SANITIZE)
     target_link_options(lookhaven_options INTERFACE -fsanitize=${LOOKHAVEN_SANITIZE} -Wl,--disable-new-dtags)
 endif()
 
+# Linking tests is much of a build, and lld takes a fraction of the time.
+find_program(LOOKHAVEN_LLD ld.lld)
+if(LOOKHAVEN_TESTS AND LOOKHAVEN_LLD)
+    target_link_options(lookhaven_options INTERFACE -fuse-ld=lld)
+endif()
+
 # lookhaven_library(<name> <source>...): a static library of one folder.
 function(lookhaven_library name)
     add_library(${name} STATIC ${ARGN})
     target_link_libraries(${name} PUBLIC lookhaven_options)
 endfunction()
 
-# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE]): a GoogleTest
-# program that ctest runs as one test under the given label (unit, component, system); ALONE: not beside others, for it
-# looks at times.
+include(GoogleTest)
+
+# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE] [BY_SUITE]): a
+# GoogleTest program. ctest runs each case as "<name>.<suite>.<case>" in a process of its own, under the given label (unit,
+# component, system). Those of one program run one after the other, for they may share segments and files of the machine.
+# ALONE: not beside any others, for it looks at times. BY_SUITE: one process per suite, for cases that share an expensive
+# set-up.
 function(lookhaven_test name label)
-    cmake_parse_arguments(arg "ALONE" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
+    cmake_parse_arguments(arg "ALONE;BY_SUITE" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     target_link_libraries(${name} PRIVATE lookhaven_options ${arg_LIBRARIES} GTest::gmock GTest::gtest GTest::gtest_main)
-    add_test(NAME ${name} COMMAND ${name})
     if(NOT arg_TIMEOUT)
         set(arg_TIMEOUT 120)
     endif()
-    set_tests_properties(${name} PROPERTIES LABELS ${label} TIMEOUT ${arg_TIMEOUT} RUN_SERIAL ${arg_ALONE})
+    set(properties LABELS ${label} TIMEOUT ${arg_TIMEOUT} RUN_SERIAL ${arg_ALONE} RESOURCE_LOCK ${name})
+    if(arg_BY_SUITE)
+        set(entries ${CMAKE_CURRENT_BINARY_DIR}/${name}_suites.cmake)
+        file(GENERATE OUTPUT ${entries} CONTENT "set(name ${name})\nset(program \"$<TARGET_FILE:${name}>\")
+set(properties ${properties})\ninclude(\"${CMAKE_SOURCE_DIR}/cmake/LookhavenSuites.cmake\")\n")
+        set_property(DIRECTORY APPEND PROPERTY TEST_INCLUDE_FILES ${entries})
+    else()
+        gtest_discover_tests(${name} TEST_PREFIX "${name}." DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
+            PROPERTIES ${properties})
+    endif()
 endfunction()

@@ -41,7 +41,8 @@ std::vector<std::string> Words(const std::string& line) {
     return words;
 }
 
-[[noreturn]] void Execute(const std::string& line, const std::filesystem::path& home) {
+[[noreturn]] void Execute(const std::filesystem::path& program, const std::string& line,
+                          const std::filesystem::path& home) {
     ::setenv("LOOKHAVEN_HOME", home.c_str(), 1);
     std::vector<std::string> words = Words(line);
     words.insert(words.begin(), "lookhaven");
@@ -50,7 +51,7 @@ std::vector<std::string> Words(const std::string& line) {
         argv.push_back(word.data());
     }
     argv.push_back(nullptr);
-    ::execv(LOOKHAVEN_PROGRAM, argv.data());
+    ::execv(program.c_str(), argv.data());
     _exit(127);
 }
 
@@ -86,6 +87,13 @@ Outcome CliTest::Run(const std::string& line, const std::string& input, bool as_
     base::WriteFileAtomically(input_file, input);
     int ends[2] = {-1, -1};
     EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+    std::filesystem::path program = LOOKHAVEN_PROGRAM;
+    if (as_nobody) {
+        // The build folder may be closed to other users.
+        program = folder_ / "lookhaven";
+        std::filesystem::copy_file(LOOKHAVEN_PROGRAM, program, std::filesystem::copy_options::skip_existing);
+        std::filesystem::permissions(program, std::filesystem::perms(0755));
+    }
     const pid_t child = ::fork();
     if (child == 0) {
         ::dup2(base::OpenFile(input_file, O_RDONLY).Get(), STDIN_FILENO);
@@ -94,7 +102,7 @@ Outcome CliTest::Run(const std::string& line, const std::string& input, bool as_
         if (as_nobody && ::geteuid() == 0 && ::setuid(kNobody) != 0) {
             _exit(126);
         }
-        Execute(line, home_);
+        Execute(program, line, home_);
     }
     ::close(ends[1]);
     const base::FileDescriptor output(ends[0]);
@@ -106,7 +114,7 @@ Outcome CliTest::RunOnTerminal(const std::string& line, const std::vector<std::s
     int terminal = -1;
     const pid_t child = ::forkpty(&terminal, nullptr, nullptr, nullptr);
     if (child == 0) {
-        Execute(line, home_);
+        Execute(LOOKHAVEN_PROGRAM, line, home_);
     }
     const base::FileDescriptor owner(terminal);
     std::string text;
