@@ -4,12 +4,10 @@
 #pragma once
 
 #include <array>
-#include <map>
 #include <optional>
 #include <string>
 
-#include <CLI/CLI.hpp>
-
+#include "standalone/cli/command_group.h"
 #include "standalone/store/cameras.h"
 
 namespace lookhaven::cli {
@@ -18,7 +16,7 @@ namespace lookhaven::cli {
 class CameraOptions {
   public:
     // This object must outlive the command.
-    void AddTo(CLI::App& command);
+    void AddTo(Command& command);
 
     // Throws Failure when a profile that has no source was given a size or rate.
     void ApplyTo(store::Camera& camera) const;
@@ -43,9 +41,11 @@ class CameraOptions {
 };
 
 // The names of the profiles and their numbers.
-const std::map<std::string, int>& ProfileNames();
+const Names<int>& ProfileNames();
 
 // "H.264" and so on.
 const char* VideoTypeName(base::Codec type);
+// The same for a member "video_type".
+std::string VideoTypeText(const Json::Value& type);
 
 }  // namespace lookhaven::cli

@@ -29,7 +29,7 @@ Bio Open(const std::string& pem) {
 Certificate RequireFirst(const Bio& bio) {
     Certificate certificate = ReadNext(bio);
     if (!certificate) {
-        throw Failure(kDataError, "there is no certificate in PEM");
+        throw Failure(kDataError, "there is no certificate in PEM format");
     }
     return certificate;
 }
@@ -79,10 +79,10 @@ std::string CertificateName(const std::string& pem) {
     if (name.starts_with("*.")) {
         name.replace(0, 1, "host");
     }
-    // The name becomes a part of the web server's configuration.
+    // The name becomes part of nginx's configuration.
     if (name.empty() || name.size() > 253 ||
         name.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789.-_") != name.npos) {
-        throw Failure(kDataError, "the certificate is for no host name");
+        throw Failure(kDataError, "the certificate names no valid host");
     }
     return name;
 }

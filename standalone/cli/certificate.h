@@ -1,18 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a web server's certificate says of itself.
+// Reads a web server's certificate.
 #pragma once
 
 #include <string>
 
 namespace lookhaven::cli {
 
-// The certificates of a PEM file, its own first, in their normal form and without anything else. Throws Failure kDataError
-// for what holds none.
+// The certificates of a PEM file in their order, re-encoded and without anything else, such as a key. Throws Failure
+// kDataError when there is none.
 std::string CertificatesIn(const std::string& pem);
 
-// A name that the certificate is for: its first DNS name, else its common name. Throws Failure kDataError when it has none
-// that a host can have.
+// A host name that the certificate is valid for: its first DNS name, else its common name. Throws Failure kDataError when
+// that is no valid host name.
 std::string CertificateName(const std::string& pem);
 
 }  // namespace lookhaven::cli

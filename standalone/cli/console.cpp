@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/console.h"
 
-#include <algorithm>
 #include <cstdlib>
 #include <iostream>
+#include <memory>
 
 #include <termios.h>
 #include <unistd.h>
@@ -12,6 +12,7 @@ namespace lookhaven::cli {
 
 namespace {
 
+// Turns off the terminal's echo while it exists.
 class EchoOff {
   public:
     EchoOff() {
@@ -31,7 +32,7 @@ class EchoOff {
 std::string ReadLine() {
     std::string line;
     if (!std::getline(std::cin, line) || line.empty()) {
-        throw Failure(kDataError, "no password was given: write it to standard input, followed by a line break");
+        throw Failure(kDataError, "no password was given: write it to standard input, followed by a newline");
     }
     if (line.back() == '\r') {
         line.pop_back();
@@ -47,12 +48,6 @@ std::string Ask(const std::string& prompt) {
     return line;
 }
 
-// How many columns the text takes, for the scripts in which cameras are mostly named.
-std::size_t Width(std::string_view text) {
-    return static_cast<std::size_t>(
-        std::count_if(text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) >> 6) != 2; }));
-}
-
 }  // namespace
 
 std::string Console::HomePath() const {
@@ -66,8 +61,8 @@ std::string Console::HomePath() const {
 base::Installation Console::Installation() const {
     const std::string home = HomePath();
     if (::access(home.c_str(), F_OK) != 0) {
-        throw Failure(kNoInput, "there is no state folder at " + home +
-                                    ": make one with lookhaven init, or name another with --home");
+        throw Failure(kNoInput, "there is no state folder at ", home,
+                      ": create it with lookhaven init, or name another with --home");
     }
     return base::Installation(home);
 }
@@ -75,32 +70,25 @@ base::Installation Console::Installation() const {
 store::Store Console::OpenStore() const {
     const base::Installation installation = Installation();
     if (::access(installation.Home().c_str(), R_OK | W_OK | X_OK) != 0) {
-        throw Failure(kNoPermission, "the state folder " + installation.Home().string() +
-                                         " cannot be written by you: run this as the user who runs the server");
+        throw Failure(kNoPermission, "you have no write access to the state folder ", installation.Home().string(),
+                      ": run this as the user who runs the server");
     }
     return store::Store::Open(installation.StoreUrl());
 }
 
-void Console::Answer(std::string_view text, const Json::Value& data) const {
+void Console::Print(const Json::Value& data, std::string_view text) const {
     std::cout << (json ? ToJson(data) : text) << (json || (!text.empty() && text.back() != '\n') ? "\n" : "");
 }
 
-std::string Table(const Rows& rows) {
-    std::vector<std::size_t> widths;
-    for (const auto& row : rows) {
-        widths.resize(std::max(widths.size(), row.size()));
-        for (std::size_t i = 0; i < row.size(); ++i) {
-            widths[i] = std::max(widths[i], Width(row[i]));
-        }
+std::string ReadPassword(const std::string& account, bool is_new) {
+    if (::isatty(STDIN_FILENO) == 0) {
+        return ReadLine();
     }
-    std::string text;
-    for (const auto& row : rows) {
-        for (std::size_t i = 0; i < row.size(); ++i) {
-            text += row[i];
-            text += i + 1 < row.size() ? std::string(widths[i] - Width(row[i]) + 2, ' ') : "\n";
-        }
+    std::string password = Ask("Password of " + account + ": ");
+    if (is_new && Ask("Repeat the password: ") != password) {
+        throw Failure(kDataError, "the two passwords differ: nothing was changed");
     }
-    return text;
+    return password;
 }
 
 std::string ToJson(const Json::Value& value) {
@@ -110,15 +98,17 @@ std::string ToJson(const Json::Value& value) {
     return Json::writeString(builder, value);
 }
 
-std::string ReadPassword(const std::string& whose, bool is_new) {
-    if (::isatty(STDIN_FILENO) == 0) {
-        return ReadLine();
+Json::Value ParseJson(const std::string& text) {
+    Json::CharReaderBuilder builder;
+    builder["stackLimit"] = 8;
+    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    Json::Value value;
+    std::string ignored;
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), &value, &ignored) ? value : Json::Value();
+    } catch (const Json::Exception&) {
+        return {};  // nested too deeply
     }
-    std::string password = Ask("Password of " + whose + ": ");
-    if (is_new && Ask("The same again: ") != password) {
-        throw Failure(kDataError, "the two passwords differ: nothing was changed");
-    }
-    return password;
 }
 
 }  // namespace lookhaven::cli

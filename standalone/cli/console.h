@@ -3,10 +3,12 @@
 // What every command shares: where the installation is, how to answer, how to fail.
 #pragma once
 
+#include <optional>
+#include <sstream>
 #include <stdexcept>
 #include <string>
 #include <string_view>
-#include <vector>
+#include <utility>
 
 #include <json/json.h>
 
@@ -18,7 +20,7 @@ namespace lookhaven::cli {
 // The exit codes of sysexits.h, which scripts tell apart.
 enum ExitCode : int {
     kOk = 0,
-    kFindings = 1,  // the doctor found something
+    kFindings = 1,  // the doctor or verify found something
     kUsage = 64,
     kDataError = 65,
     kNoInput = 66,
@@ -28,17 +30,34 @@ enum ExitCode : int {
     kNoPermission = 77,
 };
 
-// Ends the command with that code and one sentence for the operator.
+// The texts and numbers in a row.
+template <typename... Parts>
+std::string Concat(const Parts&... parts) {
+    std::ostringstream text;
+    (text << ... << parts);
+    return text.str();
+}
+
+// Ends the command with that code and one sentence for the operator, made of the parts.
 class Failure : public std::runtime_error {
   public:
-    Failure(ExitCode code, const std::string& sentence) : std::runtime_error(sentence), code_(code) {}
+    template <typename... Parts>
+    explicit Failure(ExitCode code, const Parts&... parts) : std::runtime_error(Concat(parts...)),
+                                                             code_(code) {}
     ExitCode Code() const { return code_; }
 
   private:
     ExitCode code_;
 };
 
-using Rows = std::vector<std::vector<std::string>>;
+// The record that was looked up; without one, throws Failure kNoInput with the parts for a sentence.
+template <typename Record, typename... Parts>
+Record Require(std::optional<Record> record, const Parts&... parts) {
+    if (!record) {
+        throw Failure(kNoInput, parts...);
+    }
+    return *std::move(record);
+}
 
 class Console {
   public:
@@ -51,17 +70,43 @@ class Console {
     // Throws Failure when the state folder is missing or not the caller's to change.
     store::Store OpenStore() const;
 
-    // Answers with the text, or with the data when JSON was asked for.
-    void Answer(std::string_view text, const Json::Value& data) const;
+    // Answers with the data when JSON was asked for, else with the text, which is made of the parts.
+    template <typename... Parts>
+    void Answer(const Json::Value& data, const Parts&... parts) const {
+        Print(data, Concat(parts...));
+    }
+
+  private:
+    void Print(const Json::Value& data, std::string_view text) const;
 };
-
-// The rows under each other in columns; the first row is the head.
-std::string Table(const Rows& rows);
-
-std::string ToJson(const Json::Value& value);
 
 // Asks on the terminal without echo (twice when the password is new), or reads one line when standard input is no
 // terminal. Throws Failure when there is none.
-std::string ReadPassword(const std::string& whose, bool is_new);
+std::string ReadPassword(const std::string& account, bool is_new);
+
+std::string ToJson(const Json::Value& value);
+// Null for what is no JSON or nested too deeply.
+Json::Value ParseJson(const std::string& text);
+
+// An object of names, each followed by its value: Object("id", 5, "name", "Gate").
+inline Json::Value Object() {
+    return Json::objectValue;
+}
+template <typename Value, typename... Members>
+Json::Value Object(const char* name, const Value& value, const Members&... members) {
+    Json::Value object = Object(members...);
+    object[name] = value;
+    return object;
+}
+
+// What data_of makes of each record.
+template <typename Records, typename DataOf>
+Json::Value Array(const Records& records, DataOf data_of) {
+    Json::Value array(Json::arrayValue);
+    for (const auto& record : records) {
+        array.append(data_of(record));
+    }
+    return array;
+}
 
 }  // namespace lookhaven::cli

@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven door, io, pos: doors, I/O modules and POS terminals.
-#include <charconv>
-#include <memory>
 #include <optional>
+#include <regex>
 
 #include "standalone/base/clock.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/table.h"
+#include "standalone/cli/units.h"
 #include "standalone/store/devices.h"
 
 namespace lookhaven::cli {
@@ -18,7 +20,7 @@ using store::Devices;
 using store::EmapItemType;
 using store::PortType;
 
-// One of the three groups of commands.
+// A kind of device, which is a group of commands.
 struct Kind {
     EmapItemType type;
     const char* command;
@@ -29,10 +31,11 @@ struct Kind {
 
 constexpr Kind kKinds[] = {
     {EmapItemType::kDoor, "door", "door", "Doors", "open, closed or locked"},
-    {EmapItemType::kIoModule, "io", "I/O module", "I/O modules: boxes of inputs and outputs", "on or off"},
-    {EmapItemType::kPos, "pos", "POS terminal", "POS terminals: tills", nullptr}};
+    {EmapItemType::kIoModule, "io", "I/O module", "I/O modules with digital inputs and outputs", "on or off"},
+    {EmapItemType::kPos, "pos", "POS terminal", "POS terminals", nullptr}};
 
 struct Request {
+    const Kind* kind = nullptr;
     int id = 0;
     std::optional<std::string> name;
     int server = 0;
@@ -43,53 +46,48 @@ struct Request {
     std::string state;
 };
 
-// "<index>:in" or "<index>:out", then perhaps ":<camera>".
+// "<index>:in" or "<index>:out", optionally followed by ":<camera>".
 void AddPort(const std::string& text, std::map<int, store::Port>& ports) {
-    const std::string_view whole = text;
-    const std::size_t colon = whole.find(':');
-    const std::string_view rest = colon == whole.npos ? "" : whole.substr(colon + 1);
-    const std::size_t second = rest.find(':');
-    const std::string_view type = rest.substr(0, second);
-    const std::string_view camera = second == rest.npos ? "0" : rest.substr(second + 1);
-    int index = 0;
-    store::Port port;
-    const auto is_number = [](std::string_view digits, int& number) {
-        const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), number);
-        return error == std::errc() && end == digits.data() + digits.size();
-    };
-    if (!is_number(whole.substr(0, colon), index) || (type != "in" && type != "out") ||
-        !is_number(camera, port.camera_id) || ports.contains(index)) {
-        throw Failure(kUsage, "a port is given as its number and its type, \"0:in\", or with its camera, \"0:in:4\"");
+    std::smatch parts;
+    const bool matches = std::regex_match(text, parts, std::regex("(-?[0-9]+):(in|out)(:(-?[0-9]+))?"));
+    const auto index = ParseNumber<int>(parts.str(1));
+    const auto camera = ParseNumber<int>(parts[4].matched ? parts.str(4) : "0");
+    if (!matches || !index || !camera || ports.contains(*index)) {
+        throw Failure(kUsage, "a port is its number and type, such as 0:in, or with its camera 0:in:4");
     }
-    port.type = type == "in" ? PortType::kInput : PortType::kOutput;
-    ports[index] = port;
+    ports[*index] = {parts.str(2) == "in" ? PortType::kInput : PortType::kOutput, *camera};
 }
 
-std::string PortText(const Device& device) {
+Json::Value ToData(const Device& device) {
+    const auto port_data = [](const auto& numbered) {
+        const auto& [number, port] = numbered;
+        return Object("port", number, "type", port.type == PortType::kInput ? "in" : "out", "camera", port.camera_id);
+    };
+    return Object("id", device.id, "name", device.name, "server", device.server_id, "id_on_server", device.id_on_server,
+                  "camera", device.camera_id, "ports", Array(device.ports, port_data));
+}
+
+// As the option --port takes them.
+std::string PortsText(const Json::Value& ports) {
     std::string text;
-    for (const auto& [index, port] : device.ports) {
-        text += (text.empty() ? "" : " ") + std::to_string(index) + (port.type == PortType::kInput ? ":in" : ":out") +
-                (port.camera_id == 0 ? "" : ":" + std::to_string(port.camera_id));
+    for (const Json::Value& port : ports) {
+        const std::string camera = TextUnlessZero(port["camera"]);
+        text += (text.empty() ? "" : " ") + port["port"].asString() + ":" + port["type"].asString() +
+                (camera.empty() ? "" : ":" + camera);
     }
     return text;
 }
 
-Json::Value ToData(const Device& device) {
-    Json::Value data;
-    data["id"] = device.id;
-    data["name"] = device.name;
-    data["server"] = device.server_id;
-    data["id_on_server"] = device.id_on_server;
-    data["camera"] = device.camera_id;
-    data["ports"] = Json::arrayValue;
-    for (const auto& [index, port] : device.ports) {
-        Json::Value& entry = data["ports"].append(Json::objectValue);
-        entry["port"] = index;
-        entry["type"] = port.type == PortType::kInput ? "in" : "out";
-        entry["camera"] = port.camera_id;
-    }
-    return data;
+std::string IdOnServerText(const Json::Value& device) {
+    return device["server"].asInt() == 0 ? "" : device["id_on_server"].asString();
 }
+
+constexpr Column kColumns[] = {{"id", "id"},
+                               {"name", "name"},
+                               {"server", "server", TextUnlessZero},
+                               {"id on server", "", IdOnServerText},
+                               {"camera", "camera", TextUnlessZero},
+                               {"ports", "ports", PortsText}};
 
 void Apply(const Request& request, Device& device) {
     device.name = request.name.value_or(device.name);
@@ -102,101 +100,87 @@ void Apply(const Request& request, Device& device) {
     }
 }
 
-void Add(const Console& console, const Kind& kind, const Request& request) {
+void Add(const Console& console, const Request& request) {
+    const Kind& kind = *request.kind;
     Device device{.kind = kind.type, .server_id = request.server, .id_on_server = request.id_on_server};
     Apply(request, device);
     store::Store store = console.OpenStore();
     const int id = Devices(store).Add(device);
-    console.Answer("The " + std::string(kind.name) + " " + device.name + " has the id " + std::to_string(id) + ".",
-                   ToData(*Devices(store).Find(kind.type, id)));
+    console.Answer(ToData(*Devices(store).Find(kind.type, id)), "The ", kind.name, " ", device.name, " has the id ", id,
+                   ".");
 }
 
-void Change(const Console& console, const Kind& kind, const Request& request) {
+void Change(const Console& console, const Request& request) {
+    const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
-    std::optional<Device> device = Devices(store).Find(kind.type, request.id);
-    if (!device) {
-        throw store::NotFound(std::string("there is no ") + kind.name + " " + std::to_string(request.id));
-    }
-    Apply(request, *device);
-    Devices(store).Update(*device);
-    console.Answer("The " + std::string(kind.name) + " " + device->name + " is changed.", ToData(*device));
+    Device device = Require(Devices(store).Find(kind.type, request.id), "there is no ", kind.name, " ", request.id);
+    Apply(request, device);
+    Devices(store).Update(device);
+    console.Answer(ToData(device), "The ", kind.name, " ", device.name, " was changed.");
 }
 
-void List(const Console& console, const Kind& kind, const Request&) {
+void List(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "server", "id there", "camera", "ports"}};
-    for (const Device& device : Devices(store).List(kind.type)) {
-        data.append(ToData(device));
-        const bool remote = device.server_id != 0;
-        rows.push_back({std::to_string(device.id), device.name, remote ? std::to_string(device.server_id) : "",
-                        remote ? std::to_string(device.id_on_server) : "",
-                        device.camera_id == 0 ? "" : std::to_string(device.camera_id), PortText(device)});
-    }
-    console.Answer(Table(rows), data);
+    const Json::Value data = Array(Devices(store).List(request.kind->type), ToData);
+    console.Answer(data, Table(kColumns, data));
 }
 
-void Remove(const Console& console, const Kind& kind, const Request& request) {
+void Remove(const Console& console, const Request& request) {
+    const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
     Devices(store).Remove(kind.type, request.id);
-    Json::Value data;
-    data["id"] = request.id;
-    console.Answer("The " + std::string(kind.name) + " " + std::to_string(request.id) + " is gone.", data);
+    console.Answer(Object("id", request.id), "The ", kind.name, " ", request.id, " was removed.");
 }
 
-void Report(const Console& console, const Kind& kind, const Request& request) {
+void Report(const Console& console, const Request& request) {
+    const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
     Devices(store).Report({kind.type, request.id, request.port, request.state, base::WallMillis() / 1000});
-    Json::Value data;
-    data["id"] = request.id;
-    data["state"] = request.state;
-    console.Answer("The " + std::string(kind.name) + " " + std::to_string(request.id) + " is " + request.state + ".",
-                   data);
+    console.Answer(Object("id", request.id, "state", request.state), "The ", kind.name, " ", request.id, " is ",
+                   request.state, ".");
 }
 
-void AddKind(CLI::App& program, Console& console, const Kind& kind) {
-    CLI::App* group = program.add_subcommand(kind.command, kind.purpose)->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose,
-                             void (*run)(const Console&, const Kind&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->callback([&console, &kind, request, run] { run(console, kind, *request); });
-        return added;
-    };
-    const auto take_id = [&](CLI::App* taker) { taker->add_option("id", request->id, "Its id")->required(); };
-    CLI::App* add = command("add", "Makes one known", Add);
-    add->add_option("name", request->name, "What it is called")->required();
-    CLI::App* set = command("set", "Changes what is given and leaves the rest", Change);
-    take_id(set);
-    set->add_option("--name", request->name, "What it is called");
-    for (CLI::App* each : {add, set}) {
+void AddKind(CLI::App& program, const Console& console, const Kind& kind) {
+    CommandGroup<Request> group(program, console, kind.command, kind.purpose);
+    Request& request = group.request();
+    request.kind = &kind;
+    const std::string one = std::string("the ") + kind.name;
+    const auto add_watchers = [&](Command& command) {
         if (kind.type == EmapItemType::kIoModule) {
-            each->add_option("--port", request->ports,
-                             "A port: 0:in, 1:out, or with its camera 0:in:4; may be repeated")
-                ->allow_extra_args(false);
+            command.Option("--port", request.ports, "A port: 0:in, 1:out, or with its camera 0:in:4; may be repeated",
+                           Repeatable);
         } else {
-            each->add_option("--camera", request->camera, "The camera that watches it; 0: none");
+            command.Option("--camera", request.camera, "The camera that watches " + one + "; 0 for none");
         }
-    }
+    };
+    const std::string id = "The id of " + one;
+    const std::string name = "The name of " + one;
+
+    Command add = group.Add("add", "Adds a device", Add).Option("name", request.name, name, Required);
+    add_watchers(add);
     if (kind.type != EmapItemType::kDoor) {
-        add->add_option("--server", request->server, "The recording server that owns it (else this host)");
-        add->add_option("--id-on-server", request->id_on_server, "Its id there");
+        add.Option("--server", request.server, "The recording server that owns it (default: this host)")
+            .Option("--id-on-server", request.id_on_server, "Its id on that server");
     }
-    command("list", "Lists them", List);
-    take_id(command("remove", "Removes one", Remove));
+    Command set = group.Add("set", "Changes the given properties of a device", Change)
+                      .Option("id", request.id, id, Required)
+                      .Option("--name", request.name, name);
+    add_watchers(set);
+    group.Add("list", "Lists the devices", List);
+    group.Add("remove", "Removes a device", Remove).Option("id", request.id, id, Required);
     if (kind.states != nullptr) {
-        CLI::App* report = command("report", "Says what state it is in", Report);
-        take_id(report);
-        report->add_option("state", request->state, kind.states)->required();
+        Command report = group.Add("report", "Reports the state of a device", Report)
+                             .Option("id", request.id, id, Required)
+                             .Option("state", request.state, kind.states, Required);
         if (kind.type == EmapItemType::kIoModule) {
-            report->add_option("--port", request->port, "The port's number")->required();
+            report.Option("--port", request.port, "The port's number", Required);
         }
     }
 }
 
 }  // namespace
 
-void AddDevices(CLI::App& program, Console& console) {
+void AddDevices(CLI::App& program, const Console& console) {
     for (const Kind& kind : kKinds) {
         AddKind(program, console, kind);
     }

@@ -15,6 +15,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/units.h"
 #include "standalone/control/common_config.h"
@@ -35,9 +36,9 @@ struct Finding {
 };
 using Findings = std::vector<Finding>;
 
-constexpr int kSocketLimitMs = 3000;
+constexpr int kSocketTimeoutMs = 3000;
 
-// Secrets lie in the state folder: cameras' passwords, the TLS key.
+// The state folder holds secrets: cameras' passwords, the TLS key.
 Findings CheckFolder(const base::Installation& installation) {
     Findings findings;
     for (const std::string& name :
@@ -75,7 +76,7 @@ Findings CheckStore(const base::Installation& installation) {
     } catch (const store::SchemaError& error) {
         findings.push_back({error.what(), "lookhaven init"});
     } catch (const store::StoreError& error) {
-        findings.push_back({error.what(), "see that the file or the database server is there and may be used by you"});
+        findings.push_back({error.what(), "check that the file or database server is there and that you have access"});
     }
     return findings;
 }
@@ -84,29 +85,29 @@ Findings CheckStore(const base::Installation& installation) {
 Findings CheckMount(store::Store& store, const store::Mount& mount) {
     const std::string name = "the mount " + mount.name + " at " + mount.path;
     if (::access(mount.path.c_str(), F_OK) != 0) {
-        return {
-            {name + " is not there", "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path"}};
+        return {{name + " is not there", Concat("mount its disk, or lookhaven mount set ", mount.id, " --path")}};
     }
     const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
     if (!folder) {
         return {{name + " is not the folder that was added",
-                 "mount its disk, or lookhaven mount set " + std::to_string(mount.id) + " --path " + mount.path}};
+                 Concat("mount its disk, or lookhaven mount set ", mount.id, " --path ", mount.path)}};
     }
     Findings findings;
     if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
-        findings.push_back({name + " cannot be written by you", "run this as the user who runs the server"});
+        findings.push_back({"you have no write access to " + name, "run this as the user who runs the server"});
     }
     const maintenance::MountSpace space = folder->Space();
     if (space.free_bytes < space.ReserveBytes()) {
-        findings.push_back({name + " has only " + FormatSize(space.free_bytes) + " left, recording needs " +
-                                FormatSize(space.ReserveBytes()),
-                            "make room on its disk, or lower its limit with lookhaven mount set"});
+        findings.push_back({Concat(name, " has only ", FormatSize(space.free_bytes), " left, recording needs ",
+                                   FormatSize(space.ReserveBytes())),
+                            "free space on its disk, or lower its limit with lookhaven mount set"});
     }
     const std::int64_t held = store::Events(store).Content(mount.id).size_bytes;
     if (mount.max_bytes > 0 && held > mount.max_bytes + mount.max_bytes / 10) {
         findings.push_back(
-            {name + " holds " + FormatSize(held) + " of recordings, above its limit of " + FormatSize(mount.max_bytes),
-             "start the recorder, which removes the oldest; what is archived stays: raise the limit"});
+            {Concat(name, " holds ", FormatSize(held), " of recordings, above its limit of ",
+                    FormatSize(mount.max_bytes)),
+             "start the recorder, which removes the oldest; archived events stay, raise the limit for them"});
     }
     return findings;
 }
@@ -123,14 +124,14 @@ Findings CheckMounts(const base::Installation& installation) {
             std::ranges::move(mount.enabled ? CheckMount(store, mount) : Findings(), std::back_inserter(findings));
         }
     } catch (const store::StoreError&) {
-        return {};  // said of the store already
+        return {};  // CheckStore reports it
     } catch (const std::system_error& error) {
-        findings.push_back({error.what(), "see that the disk works"});
+        findings.push_back({error.what(), "check the disk"});
     }
     return findings;
 }
 
-// An answer of any kind shows that the host accepts, forks and answers.
+// Any answer shows that the host accepts connections, forks and responds.
 bool HostAnswers(const std::string& path) {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
@@ -153,7 +154,7 @@ bool HostAnswers(const std::string& path) {
     }
     pollfd wait{socket.Get(), POLLIN, 0};
     char byte = 0;
-    return ::poll(&wait, 1, kSocketLimitMs) == 1 && ::recv(socket.Get(), &byte, 1, 0) == 1;
+    return ::poll(&wait, 1, kSocketTimeoutMs) == 1 && ::recv(socket.Get(), &byte, 1, 0) == 1;
 }
 
 Findings CheckHost(const base::Installation& installation) {
@@ -162,7 +163,7 @@ Findings CheckHost(const base::Installation& installation) {
         return {};
     }
     return {{"the web API host does not answer at " + socket,
-             "start the server with script/server, or read " + installation.LogFolder().string()}};
+             "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
 }
 
 Findings CheckRecorder(const base::Installation& installation) {
@@ -171,10 +172,10 @@ Findings CheckRecorder(const base::Installation& installation) {
         return {};
     }
     return {{config == nullptr ? "the recorder has not run since the machine started" : "the recorder does not run",
-             "start the server with script/server, or read " + installation.LogFolder().string()}};
+             "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
 }
 
-// What the recorder itself says is in its way.
+// What the recorder reports of each camera.
 Findings CheckRecordings(const base::Installation& installation) {
     control::CommonConfig* config = control::MapCommonConfig(installation);
     if (config == nullptr || !control::IsRecorderAlive(*config)) {
@@ -184,9 +185,8 @@ Findings CheckRecordings(const base::Installation& installation) {
     for (const maintenance::RecordingStatus& state : maintenance::ReadRecordingStatus(installation)) {
         if (state.state != maintenance::RecordingState::kReady &&
             state.state != maintenance::RecordingState::kRecording) {
-            findings.push_back(
-                {"camera " + std::to_string(state.camera) + " is not recorded: " + maintenance::NameOf(state.state),
-                 "see to its mount: lookhaven mount list; recording then goes on by itself"});
+            findings.push_back({Concat("camera ", state.camera, " is not recorded: ", maintenance::NameOf(state.state)),
+                                "check its mount with lookhaven mount list; recording then resumes by itself"});
         }
     }
     return findings;
@@ -195,13 +195,12 @@ Findings CheckRecordings(const base::Installation& installation) {
 Findings CheckSegments(const base::Installation& installation) {
     Findings findings;
     for (const ring::SegmentState& segment : ring::ListSegments(installation)) {
-        const std::string name =
-            "the shared memory " + std::to_string(segment.shm_id) + " of camera " + std::to_string(segment.id.camera);
+        const std::string name = Concat("the shared memory ", segment.shm_id, " of camera ", segment.id.camera);
         if (!segment.has_known_layout) {
-            findings.push_back({name + " was made by another version",
-                                "restart the server; if it stays: ipcrm -m " + std::to_string(segment.shm_id)});
+            findings.push_back({name + " was created by another version",
+                                Concat("restart the server; if it stays: ipcrm -m ", segment.shm_id)});
         } else if (!segment.writer_alive && segment.attached == 0) {
-            findings.push_back({name + " was left behind", "start the recorder, which takes it up or removes it"});
+            findings.push_back({name + " was left behind", "start the recorder, which reuses or removes it"});
         }
     }
     return findings;
@@ -222,34 +221,25 @@ void Examine(const Console& console) {
     std::size_t count = 0;
     for (const Check& check : kChecks) {
         const Findings findings = check.run(installation);
-        Json::Value entry;
-        entry["check"] = check.name;
-        entry["ok"] = findings.empty();
-        entry["findings"] = Json::arrayValue;
-        text += std::string(findings.empty() ? "ok       " : "problem  ") + check.name + "\n";
+        Json::Value list = Json::arrayValue;
+        text += Concat(findings.empty() ? "ok       " : "problem  ", check.name, "\n");
         for (const Finding& finding : findings) {
-            Json::Value item;
-            item["problem"] = finding.problem;
-            item["remedy"] = finding.remedy;
-            entry["findings"].append(item);
+            list.append(Object("problem", finding.problem, "remedy", finding.remedy));
             text += "         " + finding.problem + "\n         do: " + finding.remedy + "\n";
         }
-        data.append(entry);
+        data.append(Object("check", check.name, "ok", findings.empty(), "findings", list));
         count += findings.size();
     }
-    console.Answer(text, data);
+    console.Answer(data, text);
     if (count > 0) {
-        throw Failure(kFindings,
-                      count == 1 ? "there is one problem" : "there are " + std::to_string(count) + " problems");
+        throw Failure(kFindings, count == 1 ? "there is one problem" : Concat("there are ", count, " problems"));
     }
 }
 
 }  // namespace
 
-void AddDoctor(CLI::App& program, Console& console) {
-    program.add_subcommand("doctor", "Examines the installation and says what to do")->callback([&console] {
-        Examine(console);
-    });
+void AddDoctor(CLI::App& program, const Console& console) {
+    CommandGroup<>(program, console).Add("doctor", "Checks the installation and says what to do", Examine);
 }
 
 }  // namespace lookhaven::cli

@@ -1,15 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven emap: floor plans, what is placed on them, and maps as single files.
+// lookhaven emap: floor plans, and the files that carry them to another host.
 #include <fstream>
-#include <iterator>
-#include <memory>
+#include <iostream>
 #include <optional>
 
 #include "standalone/base/file.h"
 #include "standalone/base/text.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/emap_items.h"
+#include "standalone/cli/table.h"
 #include "standalone/emap/item_json.h"
 #include "standalone/emap/pictures.h"
 
@@ -32,34 +33,30 @@ struct Request {
 };
 
 Json::Value ToData(const Emap& emap) {
-    Json::Value data;
-    data["id"] = emap.id;
-    data["name"] = emap.name;
-    data["image"] = emap.image;
-    data["hideItemName"] = emap.hide_names;
-    data["smallItemSize"] = emap.small_items;
-    data["revision"] = emap.revision;
-    return data;
+    return Object("id", emap.id, "name", emap.name, "image", emap.image, "hideItemName", emap.hide_names,
+                  "smallItemSize", emap.small_items, "revision", emap.revision);
 }
 
-// A file of up to the limit; standard input for "-".
-std::string ReadBounded(const std::string& file, std::size_t limit) {
+constexpr Column kColumns[] = {{"id", "id"}, {"name", "name"}, {"items", "item_num"}, {"picture", "image"}};
+
+// The contents of a file, or of standard input for "-".
+std::string ReadBounded(const std::string& file, std::size_t max_bytes) {
     std::ifstream input;
     if (file != "-") {
         base::OpenFile(file, 0);  // says why it cannot be read
         input.open(file, std::ios::binary);
     }
     std::istream& stream = file == "-" ? std::cin : input;
-    std::string bytes(limit + 1, '\0');
+    std::string bytes(max_bytes + 1, '\0');
     stream.read(bytes.data(), static_cast<std::streamsize>(bytes.size()));
     bytes.resize(static_cast<std::size_t>(stream.gcount()));
-    if (bytes.size() > limit) {
-        throw Failure(kDataError, "the file is larger than " + std::to_string(limit >> 20U) + " MiB");
+    if (bytes.size() > max_bytes) {
+        throw Failure(kDataError, "the file is larger than ", max_bytes >> 20U, " MiB");
     }
     return bytes;
 }
 
-// The map goes again when it cannot have its picture and items.
+// Adds the map and lets fill add picture and items; what fill throws removes the map again.
 template <typename Fill>
 Emap AddFilled(store::Store& store, const Emap& emap, Fill&& fill) {
     const int id = Emaps(store).Add(emap);
@@ -80,7 +77,7 @@ void Add(const Console& console, const Request& request) {
     wanted.small_items = request.small_items.value_or(false);
     const Emap emap = AddFilled(store, wanted,
                                 [&](int id) { emap::Pictures(store, console.Installation().Home()).Put(id, picture); });
-    console.Answer("The e-map " + emap.name + " has the id " + std::to_string(emap.id) + ".", ToData(emap));
+    console.Answer(ToData(emap), "The e-map ", emap.name, " has the id ", emap.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
@@ -95,74 +92,51 @@ void Change(const Console& console, const Request& request) {
         emap::Pictures(store, console.Installation().Home()).Put(emap.id, *picture);
     }
     Emaps(store).Update(emap);
-    console.Answer("The e-map " + std::to_string(emap.id) + " is changed.", ToData(RequireEmap(store, emap.id)));
+    console.Answer(ToData(RequireEmap(store, emap.id)), "The e-map ", emap.id, " was changed.");
 }
 
 void List(const Console& console) {
     store::Store store = console.OpenStore();
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "items", "picture"}};
-    for (const store::EmapSummary& emap : Emaps(store).List()) {
+    const Json::Value data = Array(Emaps(store).List(), [](const store::EmapSummary& emap) {
         Json::Value entry = ToData(emap);
         entry["item_num"] = emap.item_count;
-        data.append(entry);
-        rows.push_back({std::to_string(emap.id), emap.name, std::to_string(emap.item_count), emap.image});
-    }
-    console.Answer(Table(rows), data);
+        return entry;
+    });
+    console.Answer(data, Table(kColumns, data));
 }
 
 void Show(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const Emap emap = RequireEmap(store, request.id);
-    const std::vector<EmapItem> items = Emaps(store).Items(emap.id);
     Json::Value data = ToData(emap);
-    data["items"] = emap::ToJson(items);
-    console.Answer(emap.name + "\n\n" + Table(ItemRows(items)), data);
+    data["items"] = emap::ToJson(Emaps(store).Items(emap.id));
+    console.Answer(data, emap.name, "\n\n", ItemTable(data["items"]));
 }
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Emaps(store).Remove(request.id);
     emap::Pictures(store, console.Installation().Home()).Sweep();
-    Json::Value data;
-    data["id"] = request.id;
-    console.Answer("The e-map " + std::to_string(request.id) + " is gone.", data);
+    console.Answer(Object("id", request.id), "The e-map ", request.id, " was removed.");
 }
 
 void Export(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const Emap emap = RequireEmap(store, request.id);
-    Json::Value file;
-    file["lookhaven_emap"] = kFileVersion;
-    file["name"] = emap.name;
-    file["hideItemName"] = emap.hide_names;
-    file["smallItemSize"] = emap.small_items;
-    file["items"] = emap::ToJson(Emaps(store).Items(emap.id));
-    file["picture"] = base::ToBase64(emap::Pictures(store, console.Installation().Home()).Read(emap.image));
+    const std::string picture = emap::Pictures(store, console.Installation().Home()).Read(emap.image);
+    const Json::Value file = Object("lookhaven_emap", kFileVersion, "name", emap.name, "hideItemName", emap.hide_names,
+                                    "smallItemSize", emap.small_items, "items",
+                                    emap::ToJson(Emaps(store).Items(emap.id)), "picture", base::ToBase64(picture));
     base::WriteFileAtomically(request.file, ToJson(file) + "\n", 0644);
-    Json::Value data;
-    data["id"] = emap.id;
-    data["file"] = request.file;
-    console.Answer("The e-map " + emap.name + " stands in " + request.file + ".", data);
+    console.Answer(Object("id", emap.id, "file", request.file), "The e-map ", emap.name, " was written to ",
+                   request.file, ".");
 }
 
 Json::Value ReadEmapFile(const std::string& path) {
-    const std::string text = ReadBounded(path, 2 * emap::kMaxPictureBytes);
-    Json::Value file;
-    Json::CharReaderBuilder builder;
-    builder["stackLimit"] = 8;
-    std::string ignored;
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    try {
-        if (!reader->parse(text.data(), text.data() + text.size(), &file, &ignored)) {
-            file = Json::nullValue;
-        }
-    } catch (const Json::Exception&) {
-        file = Json::nullValue;  // nested too deeply
-    }
+    const Json::Value file = ParseJson(ReadBounded(path, 2 * emap::kMaxPictureBytes));
     if (!file.isObject() || file["lookhaven_emap"] != kFileVersion || !file["name"].isString() ||
         !file["picture"].isString() || !file["hideItemName"].isBool() || !file["smallItemSize"].isBool()) {
-        throw Failure(kDataError, path + " is no e-map that lookhaven emap export wrote");
+        throw Failure(kDataError, path, " is no e-map that lookhaven emap export wrote");
     }
     return file;
 }
@@ -171,7 +145,7 @@ void Import(const Console& console, const Request& request) {
     const Json::Value file = ReadEmapFile(request.file);
     const std::optional<std::string> picture = base::FromBase64(file["picture"].asString());
     if (!picture) {
-        throw Failure(kDataError, "the picture in " + request.file + " is damaged");
+        throw Failure(kDataError, "the picture in ", request.file, " is damaged");
     }
     std::vector<EmapItem> items = emap::ItemsFromJson(file["items"]);
     store::Store store = console.OpenStore();
@@ -185,48 +159,44 @@ void Import(const Console& console, const Request& request) {
         filled.small_items = file["smallItemSize"].asBool();
         Emaps(store).ReplaceItems(filled, items);
     });
+    const std::size_t left_out = all - items.size();
     Json::Value data = ToData(emap);
-    data["items_left_out"] = static_cast<Json::UInt64>(all - items.size());
-    console.Answer("The e-map " + emap.name + " has the id " + std::to_string(emap.id) + "; " +
-                       std::to_string(all - items.size()) + " items were left out, since there is no such device here.",
-                   data);
-}
-
-void TakeFlags(CLI::App& command, const std::shared_ptr<Request>& request) {
-    command.add_flag("--hide-names,!--show-names", request->hide_names, "Whether names stand beside the items");
-    command.add_flag("--small-items,!--large-items", request->small_items, "How large the items are drawn");
+    data["items_left_out"] = Json::UInt64(left_out);
+    console.Answer(data, "The e-map ", emap.name, " has the id ", emap.id, "; ", left_out,
+                   " items were left out, since their devices do not exist here.");
 }
 
 }  // namespace
 
-void AddEmap(CLI::App& program, Console& console) {
-    CLI::App* group = program.add_subcommand("emap", "E-maps: floor plans with devices on them")->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->callback([&console, request, run] { run(console, *request); });
-        return added;
+void AddEmap(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console, "emap", "E-maps: floor plans with devices on them");
+    Request& request = group.request();
+    const std::string id = "The e-map's id";
+    const std::string name = "The e-map's name";
+    const auto add_flags = [&](Command& command) {
+        command.Switch("--hide-names,!--show-names", request.hide_names, "Whether names are shown beside the items")
+            .Switch("--small-items,!--large-items", request.small_items, "The size in which items are drawn");
     };
-    const auto take_id = [&](CLI::App* taker) { taker->add_option("id", request->id, "The map's id")->required(); };
-    CLI::App* add = command("add", "Makes a map of a picture: PNG, JPEG, WebP or SVG, at most 16 MiB", Add);
-    add->add_option("name", request->name, "What it is called")->required();
-    add->add_option("picture", request->file, "The picture's file; \"-\" for standard input")->required();
-    TakeFlags(*add, request);
-    CLI::App* set = command("set", "Changes what is given and leaves the rest", Change);
-    take_id(set);
-    set->add_option("--name", request->name, "What it is called");
-    set->add_option("--picture", request->file, "Another picture's file");
-    TakeFlags(*set, request);
-    group->add_subcommand("list", "Lists the maps")->callback([&console] { List(console); });
-    take_id(command("show", "Shows what is placed on a map", Show));
-    take_id(command("remove", "Removes a map with its picture; devices stay", Remove));
-    CLI::App* out = command("export", "Writes a map with its picture and items into one file", Export);
-    take_id(out);
-    out->add_option("file", request->file, "The file to write")->required();
-    CLI::App* in = command("import", "Makes a map of such a file; items of unknown devices are left out", Import);
-    in->add_option("file", request->file, "The file to read")->required();
-    in->add_option("--name", request->name, "Another name than the file's");
-    AddEmapItem(*group, console);
+    Command add = group.Add("add", "Adds an e-map with its picture: PNG, JPEG, WebP or SVG, at most 16 MiB", Add)
+                      .Option("name", request.name, name, Required)
+                      .Option("picture", request.file, "The picture's file; - for standard input", Required);
+    add_flags(add);
+    Command set = group.Add("set", "Changes the given properties of an e-map", Change)
+                      .Option("id", request.id, id, Required)
+                      .Option("--name", request.name, name)
+                      .Option("--picture", request.file, "The new picture's file");
+    add_flags(set);
+    group.Add("list", "Lists the e-maps", List);
+    group.Add("show", "Lists the items on an e-map", Show).Option("id", request.id, id, Required);
+    group.Add("remove", "Removes an e-map and its picture; devices are kept", Remove)
+        .Option("id", request.id, id, Required);
+    group.Add("export", "Writes an e-map with its picture and items to a file", Export)
+        .Option("id", request.id, id, Required)
+        .Option("file", request.file, "The file to write", Required);
+    group.Add("import", "Adds an e-map from an exported file; items of unknown devices are left out", Import)
+        .Option("file", request.file, "The file to read", Required)
+        .Option("--name", request.name, "Another name than that in the file");
+    AddEmapItem(group.app(), console);
 }
 
 }  // namespace lookhaven::cli

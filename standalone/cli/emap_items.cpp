@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/emap_items.h"
 
-#include <algorithm>
-#include <memory>
 #include <optional>
+#include <vector>
 
-#include "standalone/cli/commands.h"
+#include "standalone/cli/command_group.h"
+#include "standalone/cli/table.h"
 #include "standalone/emap/item_json.h"
 
 namespace lookhaven::cli {
@@ -17,11 +17,11 @@ using store::EmapItem;
 using store::EmapItemType;
 using store::Emaps;
 
-const std::map<std::string, EmapItemType> kTypes = {{"camera", EmapItemType::kCamera},
-                                                    {"emap", EmapItemType::kEmap},
-                                                    {"door", EmapItemType::kDoor},
-                                                    {"io", EmapItemType::kIoModule},
-                                                    {"pos", EmapItemType::kPos}};
+const Names<EmapItemType> kTypes = {{"camera", EmapItemType::kCamera},
+                                    {"emap", EmapItemType::kEmap},
+                                    {"door", EmapItemType::kDoor},
+                                    {"io", EmapItemType::kIoModule},
+                                    {"pos", EmapItemType::kPos}};
 
 struct Request {
     int emap = 0;
@@ -31,7 +31,6 @@ struct Request {
     std::optional<int> x, y, direction, text_pos, icon_center_x, icon_center_y, port;
 };
 
-// Takes what was given.
 void Apply(const Request& request, EmapItem& item) {
     item.name = request.name.value_or(item.name);
     item.x = request.x.value_or(item.x);
@@ -43,7 +42,7 @@ void Apply(const Request& request, EmapItem& item) {
     item.port = request.port.value_or(item.port);
 }
 
-// Reads the items, lets change work on them and saves them; someone else's change between is an error.
+// Reads the items, lets change edit them and saves them; it returns the answer. Fails when they were changed in between.
 template <typename ChangeItems>
 void Edit(const Console& console, int id, ChangeItems&& change) {
     store::Store store = console.OpenStore();
@@ -54,18 +53,14 @@ void Edit(const Console& console, int id, ChangeItems&& change) {
     try {
         emap.revision = emaps.ReplaceItems(emap, items);
     } catch (const store::Conflict& conflict) {
-        throw Failure(kUnavailable, std::string(conflict.what()) + ": try again");
+        throw Failure(kUnavailable, conflict.what(), ": try again");
     }
-    Json::Value data;
-    data["id"] = id;
-    data["revision"] = emap.revision;
-    data["items"] = emap::ToJson(items);
-    console.Answer(sentence, data);
+    console.Answer(Object("id", id, "revision", emap.revision, "items", emap::ToJson(items)), sentence);
 }
 
 EmapItem& Numbered(std::vector<EmapItem>& items, int number) {
     if (number < 1 || static_cast<std::size_t>(number) > items.size()) {
-        throw Failure(kNoInput, "the map has no item " + std::to_string(number) + ": lookhaven emap show names them");
+        throw Failure(kNoInput, "the e-map has no item ", number, ": see lookhaven emap show");
     }
     return items[static_cast<std::size_t>(number) - 1];
 }
@@ -75,14 +70,14 @@ void Add(const Console& console, const Request& request) {
         EmapItem item = request.item;
         Apply(request, item);
         items.push_back(item);
-        return "It is item " + std::to_string(items.size()) + " of the map.";
+        return Concat("It is item ", items.size(), " of the e-map.");
     });
 }
 
 void Move(const Console& console, const Request& request) {
     Edit(console, request.emap, [&](std::vector<EmapItem>& items) {
         Apply(request, Numbered(items, request.number));
-        return "The item " + std::to_string(request.number) + " is changed.";
+        return Concat("Item ", request.number, " was changed.");
     });
 }
 
@@ -90,63 +85,65 @@ void Remove(const Console& console, const Request& request) {
     Edit(console, request.emap, [&](std::vector<EmapItem>& items) {
         Numbered(items, request.number);
         items.erase(items.begin() + request.number - 1);
-        return "The item " + std::to_string(request.number) + " is off the map; the next ones moved up.";
+        return Concat("Item ", request.number, " was removed; the items after it are renumbered.");
     });
 }
 
-void TakePlace(CLI::App& command, const std::shared_ptr<Request>& request) {
-    command.add_option("--name", request->name, "What stands beside it");
-    command.add_option("--x", request->x, "Pixels from the picture's left edge");
-    command.add_option("--y", request->y, "Pixels from its upper edge");
-    command.add_option("--direction", request->direction, "Degrees clockwise from up");
-    command.add_option("--text-pos", request->text_pos, "Where its name stands: 0 below, 1 above, 2 left, 3 right");
-    command.add_option("--icon-x", request->icon_center_x, "Pixels from the icon's middle to its place");
-    command.add_option("--icon-y", request->icon_center_y, "Likewise, downwards");
-    command.add_option("--port", request->port, "One of the device's ports; -1: the device as a whole");
+constexpr Column kColumns[] = {
+    {"item", "item"},
+    {"type", "type", [](const Json::Value& type) { return NameOf(kTypes, type.asInt()); }},
+    {"id", "id"},
+    {"server", "hxId", TextUnlessZero},
+    {"port", "portIdx", [](const Json::Value& port) { return port.asInt() < 0 ? "" : PlainText(port); }},
+    {"x", "x"},
+    {"y", "y"},
+    {"direction", "direction"},
+    {"name", "name"}};
+
+void AddPlace(Command& command, Request& request) {
+    command.Option("--name", request.name, "The name shown beside it")
+        .Option("--x", request.x, "Pixels from the picture's left edge")
+        .Option("--y", request.y, "Pixels from the picture's upper edge")
+        .Option("--direction", request.direction, "Degrees clockwise from up")
+        .Option("--text-pos", request.text_pos, "Position of the name: 0 below, 1 above, 2 left, 3 right")
+        .Option("--icon-x", request.icon_center_x, "Pixels from the icon's centre to x")
+        .Option("--icon-y", request.icon_center_y, "Pixels from the icon's centre to y")
+        .Option("--port", request.port, "A port of the device; -1 for the device as a whole");
 }
 
 }  // namespace
 
 Emap RequireEmap(store::Store& store, int id) {
-    const std::optional<Emap> emap = Emaps(store).Find(id);
-    if (!emap) {
-        throw store::NotFound("there is no e-map " + std::to_string(id) + ": lookhaven emap list names them");
-    }
-    return *emap;
+    return Require(Emaps(store).Find(id), "there is no e-map ", id, ": see lookhaven emap list");
 }
 
-Rows ItemRows(const std::vector<EmapItem>& items) {
-    Rows rows = {{"item", "type", "id", "server", "port", "x", "y", "direction", "name"}};
-    for (const EmapItem& item : items) {
-        const auto type = std::ranges::find(kTypes, item.type, [](const auto& entry) { return entry.second; });
-        rows.push_back({std::to_string(rows.size()), type->first, std::to_string(item.device_id),
-                        item.server_id == 0 ? "" : std::to_string(item.server_id),
-                        item.port < 0 ? "" : std::to_string(item.port), std::to_string(item.x), std::to_string(item.y),
-                        std::to_string(item.direction), item.name});
+std::string ItemTable(Json::Value items) {
+    int number = 0;
+    for (Json::Value& item : items) {
+        item["item"] = ++number;
     }
-    return rows;
+    return Table(kColumns, items);
 }
 
-void AddEmapItem(CLI::App& emap, Console& console) {
-    CLI::App* group = emap.add_subcommand("item", "What is placed on a map")->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->add_option("map", request->emap, "The map's id")->required();
-        added->callback([&console, request, run] { run(console, *request); });
-        return added;
+void AddEmapItem(CLI::App& emap, const Console& console) {
+    CommandGroup<Request> group(emap, console, "item", "The items on an e-map");
+    Request& request = group.request();
+    const auto add_command = [&](const char* verb, const char* description,
+                                 void (*run)(const Console&, const Request&)) {
+        return group.Add(verb, description, run).Option("map", request.emap, "The e-map's id", Required);
     };
-    CLI::App* add = command("add", "Places a device", Add);
-    Choose(add->add_option("type", request->item.type, "What it is")->required(), kTypes);
-    add->add_option("id", request->item.device_id, "Its id on its own server")->required();
-    add->add_option("--server", request->item.server_id, "The recording server that owns it (else this host)");
-    TakePlace(*add, request);
-    CLI::App* move = command("move", "Changes what is given of an item's place and name", Move);
-    CLI::App* remove = command("remove", "Takes an item off the map", Remove);
-    for (CLI::App* each : {move, remove}) {
-        each->add_option("item", request->number, "The item's number, as emap show has it")->required();
-    }
-    TakePlace(*move, request);
+    const std::string number = "The item's number in emap show";
+
+    Command add =
+        add_command("add", "Places a device", Add)
+            .Option("type", request.item.type, "The type of device", OneOf(kTypes), Required)
+            .Option("id", request.item.device_id, "Its id on its own server", Required)
+            .Option("--server", request.item.server_id, "The recording server that owns it (default: this host)");
+    AddPlace(add, request);
+    Command move = add_command("move", "Changes the given properties of an item", Move)
+                       .Option("item", request.number, number, Required);
+    AddPlace(move, request);
+    add_command("remove", "Removes an item from the e-map", Remove).Option("item", request.number, number, Required);
 }
 
 }  // namespace lookhaven::cli

@@ -1,24 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven emap item: places devices on a map, moves them, takes them off.
+// lookhaven emap item: places devices on an e-map, moves and removes them.
 #pragma once
 
-#include <vector>
+#include <string>
 
 #include <CLI/CLI.hpp>
+#include <json/json.h>
 
 #include "standalone/cli/console.h"
 #include "standalone/store/emaps.h"
 
 namespace lookhaven::cli {
 
-// Throws store::NotFound.
+// Throws Failure kNoInput.
 store::Emap RequireEmap(store::Store& store, int id);
 
-// Numbered from 1 in their order, below a head.
-Rows ItemRows(const std::vector<store::EmapItem>& items);
+// A table of what emap::ToJson made of a map's items, numbered from 1 in their order.
+std::string ItemTable(Json::Value items);
 
 // Adds the commands below "emap". The console must outlive them.
-void AddEmapItem(CLI::App& emap, Console& console);
+void AddEmapItem(CLI::App& emap, const Console& console);
 
 }  // namespace lookhaven::cli

@@ -1,17 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven event: lists, shows, marks and exports what was recorded.
-#include <algorithm>
-#include <cstdlib>
 #include <filesystem>
-#include <memory>
+#include <optional>
+#include <set>
 
 #include <fcntl.h>
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
-#include "standalone/cli/camera_options.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/event_text.h"
 #include "standalone/cli/units.h"
@@ -31,9 +30,9 @@ using store::MarkKind;
 using store::Marks;
 using store::MarkState;
 
-const std::map<std::string, int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
-const std::map<std::string, MarkKind> kMarkKinds = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
-const std::map<std::string, int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", base::kReasonAlarm}};
+const Names<int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
+const Names<MarkKind> kMarkKinds = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
+const Names<int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", base::kReasonAlarm}};
 
 struct Request {
     int id = 0;
@@ -63,12 +62,9 @@ std::int64_t NowSeconds() {
 std::set<int> ChosenCameras(store::Store& store, const Request& request) {
     std::set<int> cameras(request.cameras.begin(), request.cameras.end());
     if (request.group != 0) {
-        const auto group = store::Groups(store).Find(request.group);
-        if (!group) {
-            throw Failure(kNoInput, "there is no camera group " + std::to_string(request.group) +
-                                        ": lookhaven group list names them");
-        }
-        cameras.insert(group->camera_ids.begin(), group->camera_ids.end());
+        const store::CameraGroup group = Require(store::Groups(store).Find(request.group), "there is no camera group ",
+                                                 request.group, ": see lookhaven group list");
+        cameras.insert(group.camera_ids.begin(), group.camera_ids.end());
     } else if (request.cameras.empty()) {
         cameras = Events(store).CamerasOn(request.mount);
         for (const store::Camera& camera : store::Cameras(store).List()) {
@@ -91,55 +87,40 @@ Filter FilterOf(store::Store& store, const Request& request) {
     return filter;
 }
 
-void ListRecorded(const Console& console, store::Store& store, const Request& request) {
+Json::Value FindEvents(store::Store& store, const Request& request) {
     auto filter = FilterOf<store::EventFilter>(store, request);
     filter.mount_id = request.mount;
     filter.reason = request.reason;
     filter.finished_only = request.finished;
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "camera", "start", "length", "size", "video", "audio", ""}};
-    for (const Event& event : Events(store).List(filter)) {
-        data.append(ToData(event));
-        rows.push_back({std::to_string(event.id), std::to_string(event.camera_id), FormatMoment(event.start_s),
-                        FormatDuration(event.end_s - event.start_s), FormatSize(event.size_bytes),
-                        VideoTypeName(event.video_type), event.audio_codec,
-                        std::string(event.recording ? "recording" : "") + (event.archived ? "archived" : "") +
-                            (event.demo ? "demo" : "")});
-    }
-    console.Answer(rows.size() == 1 ? "There is no such event." : Table(rows), data);
+    return Array(Events(store).List(filter), [](const Event& event) { return ToData(event); });
 }
 
-void ListMarks(const Console& console, store::Store& store, const Request& request) {
+Json::Value FindMarks(store::Store& store, const Request& request) {
     auto filter = FilterOf<store::MarkFilter>(store, request);
     filter.kind = static_cast<MarkKind>(request.kind);
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "camera", "moment", "state", "text"}};
-    for (const Mark& mark : Marks(store).List(filter)) {
-        data.append(ToData(mark));
-        rows.push_back({std::to_string(mark.id), std::to_string(mark.camera_id), FormatMoment(mark.moment_s),
-                        NameOf(mark.state), mark.text.substr(0, mark.text.find('\n'))});
-    }
-    console.Answer(rows.size() == 1 ? "There is no such event." : Table(rows), data);
+    return Array(Marks(store).List(filter), [](const Mark& mark) { return ToData(mark); });
 }
 
 void List(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    request.kind == 0 ? ListRecorded(console, store, request) : ListMarks(console, store, request);
+    const bool recorded = request.kind == 0;
+    const Json::Value data = recorded ? FindEvents(store, request) : FindMarks(store, request);
+    console.Answer(data, data.empty() ? "There is no such event." : recorded ? EventTable(data) : MarkTable(data));
 }
 
-// An event of whatever kind: ids are of one counter.
+// An event or a mark: their ids come from one counter.
 struct Found {
     std::optional<Event> event;
     std::optional<Mark> mark;
 };
 
-Found Require(store::Store& store, int id) {
+Found RequireEvent(store::Store& store, int id) {
     Found found{Events(store).Find(id), std::nullopt};
     for (const auto& [name, kind] : kMarkKinds) {
         found.mark = found.event || found.mark ? found.mark : Marks(store).Find(kind, id);
     }
     if (!found.event && !found.mark) {
-        throw Failure(kNoInput, "there is no event " + std::to_string(id) + ": lookhaven event list names them");
+        throw Failure(kNoInput, "there is no event ", id, ": see lookhaven event list");
     }
     return found;
 }
@@ -156,7 +137,7 @@ std::filesystem::path FileOf(store::Store& store, const Found& found) {
 
 void Show(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const Found found = Require(store, request.id);
+    const Found found = RequireEvent(store, request.id);
     const std::filesystem::path file = FileOf(store, found);
     const bool exists = !file.empty() && ::access(file.c_str(), R_OK) == 0;
     Json::Value data = found.event ? ToData(*found.event) : ToData(*found.mark);
@@ -166,18 +147,16 @@ void Show(const Console& console, const Request& request) {
     if (!file.empty()) {
         text += "file   " + file.string() + (exists ? "" : " (cannot be read)") + "\n";
     }
-    console.Answer(text, data);
+    console.Answer(data, text);
 }
 
 void Archive(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     if (!Events(store).SetArchived(request.id, !request.undo)) {
-        throw Failure(kNoInput,
-                      "there is no recorded event " + std::to_string(request.id) + ": lookhaven event list names them");
+        throw Failure(kNoInput, "there is no recorded event ", request.id, ": see lookhaven event list");
     }
-    console.Answer("Event " + std::to_string(request.id) +
-                       (request.undo ? " is removed in its turn again." : " is kept, whatever its mount's limits are."),
-                   ToData(*Events(store).Find(request.id)));
+    console.Answer(ToData(*Events(store).Find(request.id)), "Event ", request.id,
+                   request.undo ? " is no longer archived." : " is archived: it is kept beyond its mount's limits.");
 }
 
 void AddMark(const Console& console, const Request& request) {
@@ -188,21 +167,20 @@ void AddMark(const Console& console, const Request& request) {
     }
     store::Store store = console.OpenStore();
     const Mark mark = Marks(store).Add(request.mark_kind, request.camera, moment, ParseDuration(request.length), text);
-    console.Answer("The " + std::string(mark.kind == MarkKind::kAlert ? "alert" : "sale") + " has the id " +
-                       std::to_string(mark.id) + "; its footage from " + FormatMoment(mark.start_s) + " to " +
-                       FormatMoment(mark.end_s) + " follows.",
-                   ToData(mark));
+    console.Answer(ToData(mark), "The ", mark.kind == MarkKind::kAlert ? "alert" : "POS transaction", " has the id ",
+                   mark.id, "; its footage from ", FormatMoment(mark.start_s), " to ", FormatMoment(mark.end_s),
+                   " is saved once it is recorded.");
 }
 
 std::filesystem::path RequireFile(store::Store& store, const Request& request) {
-    const Found found = Require(store, request.id);
-    const std::string event = "event " + std::to_string(request.id);
+    const Found found = RequireEvent(store, request.id);
     if (found.mark && found.mark->state == MarkState::kPending && !found.mark->demo) {
-        throw Failure(kUnavailable, "the footage of " + event + " is not complete yet: try again after its end");
+        throw Failure(kUnavailable, "the footage of event ", request.id,
+                      " is not complete yet: try again after its end");
     }
     const std::filesystem::path file = FileOf(store, found);
     if (file.empty()) {
-        throw Failure(kNoInput, "there is no footage of " + event);
+        throw Failure(kNoInput, "there is no footage of event ", request.id);
     }
     return file;
 }
@@ -215,10 +193,10 @@ void CopyTo(int output, const std::filesystem::path& recording, const media::Exp
     }
 }
 
-// The file is not there unless it is whole.
+// Leaves no incomplete file behind.
 void CopyToFile(const std::string& file, const std::filesystem::path& recording, const media::ExportOptions& options) {
     if (::access(file.c_str(), F_OK) == 0) {
-        throw Failure(kCannotCreate, "there is already a file " + file + ": name another one");
+        throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
     }
     const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
     try {
@@ -247,57 +225,47 @@ void Export(const Console& console, const Request& request) {
         return;
     }
     CopyToFile(request.file, recording, options);
-    Json::Value data;
-    data["id"] = request.id;
-    data["file"] = request.file;
-    data["size_bytes"] = Json::Int64(std::filesystem::file_size(request.file));
-    console.Answer("Event " + std::to_string(request.id) + " is copied to " + request.file + ".", data);
-}
-
-void AddSpan(CLI::App* command, Request& request, const char* of_what) {
-    command->add_option("--from", request.from, std::string(of_what) + " from here, such as '2026-03-01 08:15' or -2h");
-    command->add_option("--to", request.to, "… up to here");
+    const auto size_bytes = static_cast<Json::Int64>(std::filesystem::file_size(request.file));
+    console.Answer(Object("id", request.id, "file", request.file, "size_bytes", size_bytes), "Event ", request.id,
+                   " was exported to ", request.file, ".");
 }
 
 }  // namespace
 
-void AddEvent(CLI::App& program, Console& console) {
-    CLI::App* group = program.add_subcommand("event", "Recorded events, alerts and sales")->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->callback([&console, request, run] { run(console, *request); });
-        return added;
+void AddEvent(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console, "event", "Recorded events, alerts and POS transactions");
+    Request& request = group.request();
+    const std::string id = "The event's id";
+    const auto add_span = [&](Command command, const std::string& what) {
+        command.Option("--from", request.from, what + " from this time on, such as '2026-03-01 08:15' or -2h")
+            .Option("--to", request.to, what + " up to this time");
     };
-    CLI::App* list = command("list", "Lists events, the newest first", List);
-    list->add_option("--camera", request->cameras, "Of this camera; may be repeated (else of all)")
-        ->allow_extra_args(false);
-    list->add_option("--group", request->group, "Of this group's cameras");
-    list->add_option("--mount", request->mount, "On this mount");
-    AddSpan(list, *request, "Events that touch the time");
-    Choose(list->add_option("--kind", request->kind, "Which kind (else recorded)"), kKinds);
-    Choose(list->add_option("--reason", request->reason, "Recorded for this reason"), kReasons);
-    list->add_flag("--finished", request->finished, "Leave out what is still recording");
-    list->add_option("--limit", request->limit, "At most so many (else 50)")->check(CLI::NonNegativeNumber);
-
-    command("show", "Shows an event", Show)->add_option("id", request->id, "The event's id")->required();
-
-    CLI::App* archive = command("archive", "Keeps a recorded event beyond its mount's limits", Archive);
-    archive->add_option("id", request->id, "The event's id")->required();
-    archive->add_flag("--undo", request->undo, "Keep it no longer than others");
-
-    CLI::App* mark = command("mark", "Reports an alert or a sale, whose footage is kept together", AddMark);
-    mark->add_option("camera", request->camera, "The camera's id")->required();
-    Choose(mark->add_option("--kind", request->mark_kind, "Which kind (else alert)"), kMarkKinds);
-    mark->add_option("--at", request->at, "When it happened (else now)");
-    mark->add_option("--length", request->length, "How long it took, such as 30s (else a moment)");
-    mark->add_option("--text", request->text, "A line of text; may be repeated")->allow_extra_args(false);
-
-    CLI::App* copy = command("export", "Copies an event to a Matroska file, without coding it anew", Export);
-    copy->add_option("id", request->id, "The event's id")->required();
-    copy->add_option("file", request->file, "The file to make; - for standard output")->required();
-    copy->add_flag("--no-sound", request->no_sound, "Leave out the sound");
-    AddSpan(copy, *request, "Only footage");
+    Command list =
+        group.Add("list", "Lists events, newest first", List)
+            .Option("--camera", request.cameras, "Events of this camera; may be repeated (default: all)", Repeatable)
+            .Option("--group", request.group, "Events of the cameras in this group")
+            .Option("--mount", request.mount, "Events on this mount")
+            .Option("--kind", request.kind, "The kind of events (default: recorded)", OneOf(kKinds))
+            .Option("--reason", request.reason, "Events recorded for this reason", OneOf(kReasons))
+            .Flag("--finished", request.finished, "Leave out events that are still being recorded")
+            .Option("--limit", request.limit, "Maximum number of events (default: 50)",
+                    Satisfies(CLI::NonNegativeNumber));
+    add_span(list, "Events");
+    group.Add("show", "Shows an event", Show).Option("id", request.id, id, Required);
+    group.Add("archive", "Keeps a recorded event beyond its mount's limits", Archive)
+        .Option("id", request.id, id, Required)
+        .Flag("--undo", request.undo, "No longer keep it beyond them");
+    group.Add("mark", "Reports an alert or POS transaction, whose footage is kept together", AddMark)
+        .Option("camera", request.camera, "The camera's id", Required)
+        .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(kMarkKinds))
+        .Option("--at", request.at, "When it happened (default: now)")
+        .Option("--length", request.length, "How long it took, such as 30s (default: 0)")
+        .Option("--text", request.text, "A line of text; may be repeated", Repeatable);
+    Command copy = group.Add("export", "Copies an event to a Matroska file without transcoding", Export)
+                       .Option("id", request.id, id, Required)
+                       .Option("file", request.file, "The file to create; - for standard output", Required)
+                       .Flag("--no-sound", request.no_sound, "Leave out the audio");
+    add_span(copy, "Footage");
 }
 
 }  // namespace lookhaven::cli

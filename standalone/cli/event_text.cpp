@@ -1,81 +1,98 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/event_text.h"
 
-#include <string>
-
 #include "standalone/cli/camera_options.h"
+#include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 
 namespace lookhaven::cli {
 
 namespace {
 
-std::string NameOf(store::MarkKind kind) {
-    return kind == store::MarkKind::kAlert ? "alert" : "pos";
-}
-
-}  // namespace
-
 const char* NameOf(store::MarkState state) {
     return state == store::MarkState::kPending ? "pending" : state == store::MarkState::kSaved ? "saved" : "missed";
 }
 
+std::string MomentText(const Json::Value& moment) {
+    return FormatMoment(moment.asInt64());
+}
+
+std::string LengthText(const Json::Value& event) {
+    return FormatDuration(event["end"].asInt64() - event["start"].asInt64());
+}
+
+std::string SizeText(const Json::Value& size) {
+    return FormatSize(size.asInt64());
+}
+
+std::string StateText(const Json::Value& event) {
+    std::string text;
+    for (const char* state : {"recording", "archived", "demo"}) {
+        text += event[state].asBool() ? state : "";
+    }
+    return text;
+}
+
+std::string FirstLine(const Json::Value& text) {
+    const std::string all = text.asString();
+    return all.substr(0, all.find('\n'));
+}
+
+constexpr Column kEventColumns[] = {{"id", "id"},
+                                    {"camera", "camera_id"},
+                                    {"start", "start", MomentText},
+                                    {"length", "", LengthText},
+                                    {"size", "size_bytes", SizeText},
+                                    {"video", "video_type", VideoTypeText},
+                                    {"audio", "audio_codec"},
+                                    {"", "", StateText}};
+constexpr Column kMarkColumns[] = {{"id", "id"},
+                                   {"camera", "camera_id"},
+                                   {"moment", "moment", MomentText},
+                                   {"state", "state"},
+                                   {"text", "text", FirstLine}};
+
+}  // namespace
+
 Json::Value ToData(const store::Event& event) {
-    Json::Value data;
-    data["kind"] = "recorded";
-    data["id"] = event.id;
-    data["camera_id"] = event.camera_id;
-    data["mount_id"] = event.mount_id;
-    data["start"] = Json::Int64(event.start_s);
-    data["end"] = Json::Int64(event.end_s);
-    data["recording"] = event.recording;
-    data["reason"] = event.reason;
-    data["frame_count"] = event.frame_count;
-    data["size_bytes"] = Json::Int64(event.size_bytes);
-    data["video_type"] = static_cast<int>(event.video_type);
-    data["audio_codec"] = event.audio_codec;
-    data["width"] = event.width;
-    data["height"] = event.height;
-    data["path"] = event.path;
-    data["archived"] = event.archived;
-    data["demo"] = event.demo;
-    return data;
+    return Object("kind", "recorded", "id", event.id, "camera_id", event.camera_id, "mount_id", event.mount_id, "start",
+                  event.start_s, "end", event.end_s, "recording", event.recording, "reason", event.reason,
+                  "frame_count", event.frame_count, "size_bytes", event.size_bytes, "video_type",
+                  static_cast<int>(event.video_type), "audio_codec", event.audio_codec, "width", event.width, "height",
+                  event.height, "path", event.path, "archived", event.archived, "demo", event.demo);
 }
 
 Json::Value ToData(const store::Mark& mark) {
-    Json::Value data;
-    data["kind"] = NameOf(mark.kind);
-    data["id"] = mark.id;
-    data["camera_id"] = mark.camera_id;
-    data["moment"] = Json::Int64(mark.moment_s);
-    data["start"] = Json::Int64(mark.start_s);
-    data["end"] = Json::Int64(mark.end_s);
-    data["text"] = mark.text;
-    data["state"] = NameOf(mark.state);
-    data["mount_id"] = mark.mount_id;
-    data["path"] = mark.path;
-    data["demo"] = mark.demo;
-    return data;
+    return Object("kind", mark.kind == store::MarkKind::kAlert ? "alert" : "pos", "id", mark.id, "camera_id",
+                  mark.camera_id, "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text", mark.text,
+                  "state", NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo);
+}
+
+std::string EventTable(const Json::Value& events) {
+    return Table(kEventColumns, events);
+}
+
+std::string MarkTable(const Json::Value& marks) {
+    return Table(kMarkColumns, marks);
 }
 
 std::string Description(const store::Event& event) {
-    const std::string reason = event.reason == base::kReasonAlarm        ? "an alarm"
+    const std::string reason = event.reason == base::kReasonAlarm        ? "alarm"
                                : event.reason == base::kReasonContinuous ? "continuous recording"
-                                                                         : "reason " + std::to_string(event.reason);
-    return "Event " + std::to_string(event.id) + " of camera " + std::to_string(event.camera_id) + ", " + reason +
-           (event.recording ? ", still recording" : "") + (event.archived ? ", archived" : "") +
-           (event.demo ? ", made up for a trial" : "") + "\nfrom   " + FormatMoment(event.start_s) + "\nto     " +
-           FormatMoment(event.end_s) + "\nvideo  " + VideoTypeName(event.video_type) + " " +
-           std::to_string(event.width) + "x" + std::to_string(event.height) + ", " + std::to_string(event.frame_count) +
-           " frames\naudio  " + (event.audio_codec.empty() ? "none" : event.audio_codec) + "\nsize   " +
-           FormatSize(event.size_bytes) + "\n";
+                                                                         : Concat("reason ", event.reason);
+    return Concat(
+        "Event ", event.id, " of camera ", event.camera_id, ", ", reason, event.recording ? ", still recording" : "",
+        event.archived ? ", archived" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
+        "\nto     ", FormatMoment(event.end_s), "\nvideo  ", VideoTypeName(event.video_type), " ", event.width, "x",
+        event.height, ", ", event.frame_count, " frames\naudio  ",
+        event.audio_codec.empty() ? "none" : event.audio_codec, "\nsize   ", FormatSize(event.size_bytes), "\n");
 }
 
 std::string Description(const store::Mark& mark) {
-    return (mark.kind == store::MarkKind::kAlert ? "Alert " : "Sale ") + std::to_string(mark.id) + " of camera " +
-           std::to_string(mark.camera_id) + ", " + NameOf(mark.state) + (mark.demo ? ", made up for a trial" : "") +
-           "\nat     " + FormatMoment(mark.moment_s) + "\nfrom   " + FormatMoment(mark.start_s) + "\nto     " +
-           FormatMoment(mark.end_s) + "\n" + (mark.text.empty() ? "" : mark.text + "\n");
+    return Concat(mark.kind == store::MarkKind::kAlert ? "Alert " : "POS transaction ", mark.id, " of camera ",
+                  mark.camera_id, ", ", NameOf(mark.state), mark.demo ? ", generated" : "", "\nat     ",
+                  FormatMoment(mark.moment_s), "\nfrom   ", FormatMoment(mark.start_s), "\nto     ",
+                  FormatMoment(mark.end_s), "\n", mark.text, mark.text.empty() ? "" : "\n");
 }
 
 }  // namespace lookhaven::cli

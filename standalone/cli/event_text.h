@@ -12,13 +12,15 @@
 
 namespace lookhaven::cli {
 
-const char* NameOf(store::MarkState state);
-
 // All that the record says.
 Json::Value ToData(const store::Event& event);
 Json::Value ToData(const store::Mark& mark);
 
-// The same in lines for a reader.
+// Tables of a list of such data.
+std::string EventTable(const Json::Value& events);
+std::string MarkTable(const Json::Value& marks);
+
+// The record in several lines.
 std::string Description(const store::Event& event);
 std::string Description(const store::Mark& mark);
 

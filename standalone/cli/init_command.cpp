@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven init: makes a state folder, or brings one up to date.
+// lookhaven init: creates the state folder, or upgrades an existing one.
 #include <cstdint>
 #include <filesystem>
-#include <memory>
 #include <system_error>
 
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -16,15 +16,19 @@ namespace lookhaven::cli {
 
 namespace {
 
-base::Installation MakeFolders(const std::string& home) {
+struct Request {
+    std::string admin;
+};
+
+base::Installation CreateFolders(const std::string& home) {
     try {
         base::Installation::CreateFolders(home);
         base::Installation installation(home);
         control::DebugLogEditor debug_log(installation);
         return installation;
     } catch (const std::system_error& error) {
-        throw Failure(kCannotCreate, "cannot set up the state folder " + home + ": " + error.code().message() +
-                                         "; choose another with --home or make this one writable");
+        throw Failure(kCannotCreate, "cannot set up the state folder ", home, ": ", error.code().message(),
+                      "; choose another with --home or make this one writable");
     }
 }
 
@@ -37,8 +41,8 @@ bool AddAdmin(store::Store& store, const std::string& name) {
     return true;
 }
 
-// The folder "recordings" in the state folder, with half of what is free there for a limit: a trial must not fill the disk
-// that the machine itself lives on. False when there is a mount already.
+// The folder "recordings" in the state folder, limited to half of the free space: a trial must not fill the system's disk.
+// False when there is a mount already.
 bool AddDefaultMount(store::Store& store, const base::Installation& installation) {
     store::Mounts mounts(store);
     if (!mounts.List().empty()) {
@@ -56,31 +60,28 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     return true;
 }
 
-void Init(const Console& console, const std::string& admin) {
-    const base::Installation installation = MakeFolders(console.HomePath());
+void Init(const Console& console, const Request& request) {
+    const std::string& admin = request.admin;
+    const base::Installation installation = CreateFolders(console.HomePath());
     const int steps = store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
     const bool mount_added = AddDefaultMount(store, installation);
-    const bool added = !admin.empty() && AddAdmin(store, admin);
-    Json::Value data;
-    data["home"] = installation.Home().string();
-    data["migrations"] = steps;
-    data["admin_added"] = added;
-    data["mount_added"] = mount_added;
-    console.Answer("The state folder " + installation.Home().string() + " is ready." +
-                       (added           ? "\nThe account " + admin + " may log in."
-                        : admin.empty() ? ""
-                                        : "\nThe account " + admin + " exists already and stays as it is."),
-                   data);
+    const bool admin_added = !admin.empty() && AddAdmin(store, admin);
+    const std::string home = installation.Home().string();
+    std::string text = "The state folder " + home + " is ready.";
+    if (!admin.empty()) {
+        text += "\nThe account " + admin + (admin_added ? " was added." : " exists already and was not changed.");
+    }
+    console.Answer(Object("home", home, "migrations", steps, "admin_added", admin_added, "mount_added", mount_added),
+                   text);
 }
 
 }  // namespace
 
-void AddInit(CLI::App& program, Console& console) {
-    CLI::App* init = program.add_subcommand("init", "Makes the state folder, or brings an old one up to date");
-    auto admin = std::make_shared<std::string>();
-    init->add_option("--admin", *admin, "Also make this owner account; its password is asked for");
-    init->callback([&console, admin] { Init(console, *admin); });
+void AddInit(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console);
+    group.Add("init", "Creates the state folder, or upgrades an existing one", Init)
+        .Option("--admin", group.request().admin, "Also add this owner account; prompts for its password");
 }
 
 }  // namespace lookhaven::cli

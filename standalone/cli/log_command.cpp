@@ -1,33 +1,50 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven log: how much the processes of the installation log.
+// lookhaven log: the log levels of the installation's processes.
 #include <algorithm>
 #include <map>
-#include <memory>
-#include <optional>
 
 #include "standalone/base/process.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/table.h"
 #include "standalone/control/debug_log_config.h"
 
 namespace lookhaven::cli {
 
 namespace {
 
-const std::map<std::string, int> kLevels = {{"off", 0},    {"error", 1}, {"warning", 3},
-                                            {"notice", 4}, {"info", 5},  {"debug", 6}};
-const std::map<std::string, int> kCategories = {{"liveview", 32}, {"player", 68}};
+const Names<int> kLevels = {{"off", 0}, {"error", 1}, {"warning", 3}, {"notice", 4}, {"info", 5}, {"debug", 6}};
+const Names<int> kCategories = {{"liveview", 32}, {"player", 68}};
 
-struct Change {
+struct Request {
     int level = 0;
     std::vector<int> categories;
     std::vector<pid_t> processes;
 };
 
-std::string NameOf(const std::map<std::string, int>& names, int number) {
-    const auto found =
-        std::find_if(names.begin(), names.end(), [number](const auto& entry) { return entry.second == number; });
-    return found == names.end() ? std::to_string(number) : found->first;
+constexpr Column kColumns[] = {
+    {"what", "what"}, {"level", "level", [](const Json::Value& level) { return NameOf(kLevels, level.asInt()); }}};
+
+std::string LevelTable(const Json::Value& data) {
+    Json::Value rows = Json::arrayValue;
+    for (const Json::Value& category : data["categories"]) {
+        rows.append(Object("what", "category " + category["name"].asString(), "level", category["level"]));
+    }
+    rows.append(Object("what", "other categories", "level", data["other_categories"]));
+    for (const Json::Value& process : data["processes"]) {
+        rows.append(Object("what", "process " + process["pid"].asString(), "level", process["level"]));
+    }
+    return Table(kColumns, rows);
+}
+
+// Most of the 512 categories are unused and stay at the level that most have.
+int CommonLevel(const control::DebugLogConfig& config) {
+    std::map<int, int> uses;
+    for (const int level : config.category_level) {
+        ++uses[level];
+    }
+    return std::max_element(uses.begin(), uses.end(), [](auto& a, auto& b) { return a.second < b.second; })->first;
 }
 
 void Show(const Console& console) {
@@ -35,81 +52,61 @@ void Show(const Console& console) {
     if (config == nullptr) {
         throw Failure(kNoInput, "there is no log configuration yet: run lookhaven init");
     }
-    // Most of the 512 categories are nobody's and stay at the level that most have.
-    std::map<int, int> uses;
-    for (const int level : config->category_level) {
-        ++uses[level];
-    }
-    const int common =
-        std::max_element(uses.begin(), uses.end(), [](auto& a, auto& b) { return a.second < b.second; })->first;
-    Json::Value data;
-    data["other_categories"] = common;
-    data["categories"] = data["processes"] = Json::arrayValue;
-    Rows rows = {{"what", "level"}};
+    const int common = CommonLevel(*config);
+    Json::Value categories = Json::arrayValue;
     for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
         const int level = config->category_level[category];
         const std::string name = NameOf(kCategories, category);
         if (level != common || kCategories.contains(name)) {
-            Json::Value entry;
-            entry["category"] = category;
-            entry["name"] = name;
-            entry["level"] = level;
-            data["categories"].append(entry);
-            rows.push_back({"category " + name, NameOf(kLevels, level)});
+            categories.append(Object("category", category, "name", name, "level", level));
         }
     }
-    rows.push_back({"other categories", NameOf(kLevels, common)});
+    Json::Value processes = Json::arrayValue;
     for (int i = 0; i < std::min(config->process_count, control::kDebugLogProcessCount); ++i) {
-        Json::Value entry;
-        entry["pid"] = config->process[i].pid;
-        entry["level"] = config->process[i].level;
-        data["processes"].append(entry);
-        rows.push_back(
-            {"process " + std::to_string(config->process[i].pid), NameOf(kLevels, config->process[i].level)});
+        processes.append(Object("pid", config->process[i].pid, "level", config->process[i].level));
     }
-    console.Answer(Table(rows), data);
+    const Json::Value data = Object("other_categories", common, "categories", categories, "processes", processes);
+    console.Answer(data, LevelTable(data));
 }
 
-void Set(const Console& console, const Change& change) {
+void Set(const Console& console, const Request& request) {
     control::DebugLogEditor editor(console.Installation());
-    for (const pid_t pid : change.processes) {
-        if (change.level != 0 && base::ProcessStartTicks(pid) == 0) {
-            throw Failure(kDataError, "there is no process " + std::to_string(pid));
+    for (const pid_t pid : request.processes) {
+        if (request.level != 0 && base::ProcessStartTicks(pid) == 0) {
+            throw Failure(kDataError, "there is no process ", pid);
         }
     }
-    for (const int category : change.categories) {
-        editor.SetCategory(category, change.level);
+    for (const int category : request.categories) {
+        editor.SetCategory(category, request.level);
     }
-    for (const pid_t pid : change.processes) {
-        if (change.level == 0) {
+    for (const pid_t pid : request.processes) {
+        if (request.level == 0) {
             editor.RemoveProcess(pid);
         } else {
-            editor.SetProcess(pid, change.level);
+            editor.SetProcess(pid, request.level);
         }
     }
-    if (change.categories.empty() && change.processes.empty()) {
-        editor.SetEveryCategory(change.level);
+    if (request.categories.empty() && request.processes.empty()) {
+        editor.SetEveryCategory(request.level);
     }
     Show(console);
 }
 
 }  // namespace
 
-void AddLog(CLI::App& program, Console& console) {
-    CLI::App* log = program.add_subcommand("log", "How much the processes log")->require_subcommand(1);
-    log->add_subcommand("show", "Shows the levels")->callback([&console] { Show(console); });
-    CLI::App* set = log->add_subcommand("set", "Sets the level of categories or processes, or of every category");
-    auto change = std::make_shared<Change>();
-    Choose(set->add_option("level", change->level, "What is logged: this and all that is worse"), kLevels)->required();
-    set->add_option("--category", change->categories, "A category by name or number; may be repeated")
-        ->allow_extra_args(false)
-        ->transform(CLI::Transformer(kCategories).description(""))
-        ->type_name("liveview|player|NUMBER")
-        ->check(CLI::Range(0, control::kDebugLogCategoryCount - 1));
-    set->add_option("--process", change->processes, "A process id; may be repeated")
-        ->allow_extra_args(false)
-        ->check(CLI::PositiveNumber);
-    set->callback([&console, change] { Set(console, *change); });
+void AddLog(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console, "log", "Log levels");
+    Request& request = group.request();
+    const auto category = [](CLI::Option& option) {
+        option.transform(CLI::Transformer(kCategories).description(""))->type_name("liveview|player|NUMBER");
+        option.check(CLI::Range(0, control::kDebugLogCategoryCount - 1));
+    };
+    group.Add("show", "Shows the log levels", Show);
+    group.Add("set", "Sets the log level of categories or processes, or of all categories", Set)
+        .Option("level", request.level, "Log messages of this level and more severe ones", OneOf(kLevels), Required)
+        .Option("--category", request.categories, "A category by name or number; may be repeated", Repeatable, category)
+        .Option("--process", request.processes, "A process id; may be repeated", Repeatable,
+                Satisfies(CLI::PositiveNumber));
 }
 
 }  // namespace lookhaven::cli

@@ -6,6 +6,7 @@
 #include <system_error>
 
 #include "standalone/archive/archive_error.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/media/source.h"
 
@@ -24,17 +25,15 @@ ExitCode CodeOf(const std::system_error& error) {
 
 int Report(const Console& console, ExitCode code, const std::string& sentence) {
     if (console.json) {
-        Json::Value answer;
-        answer["error"]["code"] = static_cast<int>(code);
-        answer["error"]["message"] = sentence;
-        std::cerr << ToJson(answer) << '\n';
+        const Json::Value error = Object("code", static_cast<int>(code), "message", sentence);
+        std::cerr << ToJson(Object("error", error)) << '\n';
     } else {
         std::cerr << "lookhaven: " << sentence << '\n';
     }
     return code;
 }
 
-// The command that the words name, as far as they name one.
+// The most specific command that the arguments name.
 const CLI::App& Innermost(const CLI::App& program) {
     const std::vector<CLI::App*> chosen = program.get_subcommands();
     return chosen.empty() ? program : Innermost(*chosen.back());
@@ -45,48 +44,38 @@ std::string FullName(const CLI::App& command) {
     return (parent == nullptr ? "" : FullName(*parent) + " ") + command.get_name();
 }
 
-// CLI11's own words repeat the arguments, and a password that was given by mistake would show again.
+// CLI11's own messages repeat the arguments, and a password given by mistake would be printed.
 std::string UsageSentence(const CLI::App& program, const CLI::ParseError& error) {
     const std::string name = FullName(Innermost(program));
-    const std::string words = error.what();
-    std::string what = words;
+    const std::string message = error.what();
+    std::string what = message;
     if (dynamic_cast<const CLI::ExtrasError*>(&error) != nullptr) {
-        what = "there are arguments that " + name + " does not take";
+        what = name + " does not take these arguments";
     } else if (dynamic_cast<const CLI::ConversionError*>(&error) != nullptr) {
-        what = "an argument of " + name + " has a wrong form";
+        what = "an argument of " + name + " is malformed";
     } else if (dynamic_cast<const CLI::ValidationError*>(&error) != nullptr) {
-        what = words.substr(0, words.find(':')) + " does not take such a value";
+        what = message.substr(0, message.find(':')) + " does not take this value";
     }
     return what + ": see " + name + " --help";
 }
 
+void ShowVersion(const Console& console) {
+    console.Answer(Object("version", LOOKHAVEN_VERSION, "schema", store::Store::SchemaVersion()),
+                   "lookhaven " LOOKHAVEN_VERSION);
+}
+
 int Run(int argc, char** argv) {
     Console console;
-    CLI::App program("Sets up and looks after a Lookhaven installation.", "lookhaven");
+    CLI::App program("Sets up and maintains a Lookhaven installation.", "lookhaven");
     program.fallthrough();
     program.require_subcommand(1);
-    program.add_option("--home", console.home_option, "The state folder (else LOOKHAVEN_HOME, else var)");
+    program.add_option("--home", console.home_option, "The state folder (default: $LOOKHAVEN_HOME, else var)");
     program.add_flag("--json", console.json, "Answer in JSON");
-    AddInit(program, console);
-    AddCamera(program, console);
-    AddUser(program, console);
-    AddLog(program, console);
-    AddGroup(program, console);
-    AddMount(program, console);
-    AddEvent(program, console);
-    AddEmap(program, console);
-    AddDevices(program, console);
-    AddServer(program, console);
-    AddSetting(program, console);
-    AddVerify(program, console);
-    AddDemo(program, console);
-    AddDoctor(program, console);
-    program.add_subcommand("version", "Says which version this is")->callback([&console] {
-        Json::Value data;
-        data["version"] = LOOKHAVEN_VERSION;
-        data["schema"] = store::Store::SchemaVersion();
-        console.Answer("lookhaven " LOOKHAVEN_VERSION, data);
-    });
+    for (const auto add : {AddInit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddEmap, AddDevices,
+                           AddServer, AddSetting, AddVerify, AddDemo, AddDoctor}) {
+        add(program, console);
+    }
+    CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);
     try {
         program.parse(argc, argv);
         return kOk;

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/pair_text.h"
 
-#include <memory>
 #include <optional>
 
 #include "standalone/base/text.h"
@@ -12,15 +11,6 @@ namespace lookhaven::cli {
 namespace {
 
 constexpr std::string_view kPrefix = "lookhaven-pair-1:";
-
-Json::Value ParseJson(const std::string& text) {
-    Json::CharReaderBuilder builder;
-    builder["stackLimit"] = 8;
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    Json::Value value;
-    std::string ignored;
-    return reader->parse(text.data(), text.data() + text.size(), &value, &ignored) ? value : Json::Value();
-}
 
 PairOffer Read(const Json::Value& json) {
     PairOffer offer{json["address"].asString(),
@@ -40,34 +30,29 @@ PairOffer Read(const Json::Value& json) {
 }  // namespace
 
 std::string ToText(const PairOffer& offer) {
-    Json::Value json;
-    json["address"] = offer.address;
-    json["port"] = offer.port;
-    json["certificate"] = offer.certificate;
-    json["secret"] = offer.secret;
-    json["cameras"] = Json::arrayValue;
-    for (const store::RemoteCamera& camera : offer.cameras) {
-        Json::Value& entry = json["cameras"].append(Json::objectValue);
-        entry["id"] = camera.id_on_server;
-        entry["name"] = camera.name;
-        entry["video"] = static_cast<int>(camera.video_type);
-        entry["audio"] = camera.audio;
-    }
-    return std::string(kPrefix) + base::ToBase64(ToJson(json));
+    const Json::Value cameras = Array(offer.cameras, [](const store::RemoteCamera& camera) {
+        return Object("id", camera.id_on_server, "name", camera.name, "video", static_cast<int>(camera.video_type),
+                      "audio", camera.audio);
+    });
+    return std::string(kPrefix) +
+           base::ToBase64(ToJson(Object("address", offer.address, "port", offer.port, "certificate", offer.certificate,
+                                        "secret", offer.secret, "cameras", cameras)));
 }
 
 PairOffer ParsePairText(const std::string& text) {
     std::string_view rest = text;
     if (rest.starts_with(kPrefix)) {
         rest.remove_prefix(kPrefix.size());
-        if (const std::optional<std::string> json = base::FromBase64(rest)) {
-            try {
-                return Read(ParseJson(*json));
-            } catch (const Json::Exception&) {
+        const Json::Value json = ParseJson(base::FromBase64(rest).value_or(""));
+        try {
+            if (json.isObject()) {
+                return Read(json);
             }
+        } catch (const Json::Exception&) {
+            // a member of the wrong type
         }
     }
-    throw Failure(kDataError, "this is no text that lookhaven server pair wrote");
+    throw Failure(kDataError, "this is not a line that lookhaven server pair wrote");
 }
 
 }  // namespace lookhaven::cli

@@ -4,10 +4,8 @@
 #include <algorithm>
 #include <cstdint>
 #include <limits>
-#include <map>
 
 #include "standalone/cli/camera_options.h"
-#include "standalone/cli/commands.h"
 #include "standalone/cli/units.h"
 
 namespace lookhaven::cli {
@@ -16,9 +14,9 @@ namespace {
 
 using store::RecordMode;
 
-const std::map<std::string, RecordMode> kModes = {{"always", RecordMode::kAlways}, {"never", RecordMode::kNever}};
+const Names<RecordMode> kModes = {{"always", RecordMode::kAlways}, {"never", RecordMode::kNever}};
 
-// What is far too long is refused by the store with its rule.
+// The store refuses what is too long, with the limit in its message.
 void AssignSeconds(int& target, const std::optional<std::string>& given) {
     if (given) {
         target = static_cast<int>(std::min<std::int64_t>(ParseDuration(*given), std::numeric_limits<int>::max()));
@@ -27,14 +25,13 @@ void AssignSeconds(int& target, const std::optional<std::string>& given) {
 
 }  // namespace
 
-void RecordingOptions::AddTo(CLI::App& command) {
-    Choose(command.add_option("--record", mode_, "When it is recorded (never at first)"), kModes);
-    command.add_option("--segment", segment_, "Cut recordings into pieces so long, 10s to 60m (5m at first)");
-    command.add_option("--pre", pre_, "Footage before an alert or sale, at most 5m (5s at first)");
-    command.add_option("--post", post_, "Footage after it (10s at first)");
-    command.add_option("--mount", mount_, "Record to this mount; 0 for the default");
-    Choose(command.add_option("--record-profile", profile_, "The profile that is recorded (high at first)"),
-           ProfileNames());
+void RecordingOptions::AddTo(Command& command) {
+    command.Option("--record", mode_, "When it is recorded (initially never)", OneOf(kModes))
+        .Option("--segment", segment_, "Length of a recorded event, 10s to 60m (initially 5m)")
+        .Option("--pre", pre_, "Footage kept before an alert or POS transaction, at most 5m (initially 5s)")
+        .Option("--post", post_, "Footage kept after it (initially 10s)")
+        .Option("--mount", mount_, "The mount to record to; 0 for the default mount")
+        .Option("--record-profile", profile_, "The profile to record (initially high)", OneOf(ProfileNames()));
 }
 
 void RecordingOptions::ApplyTo(store::RecordingPlan& plan) const {
@@ -47,14 +44,8 @@ void RecordingOptions::ApplyTo(store::RecordingPlan& plan) const {
 }
 
 Json::Value PlanData(const store::RecordingPlan& plan) {
-    Json::Value data;
-    data["mode"] = plan.mode == RecordMode::kAlways ? "always" : "never";
-    data["segment"] = plan.segment_s;
-    data["pre"] = plan.pre_s;
-    data["post"] = plan.post_s;
-    data["mount_id"] = plan.mount_id;
-    data["profile"] = plan.profile;
-    return data;
+    return Object("mode", plan.mode == RecordMode::kAlways ? "always" : "never", "segment", plan.segment_s, "pre",
+                  plan.pre_s, "post", plan.post_s, "mount_id", plan.mount_id, "profile", plan.profile);
 }
 
 }  // namespace lookhaven::cli

@@ -6,9 +6,9 @@
 #include <optional>
 #include <string>
 
-#include <CLI/CLI.hpp>
 #include <json/json.h>
 
+#include "standalone/cli/command_group.h"
 #include "standalone/store/recording_plans.h"
 
 namespace lookhaven::cli {
@@ -17,7 +17,7 @@ namespace lookhaven::cli {
 class RecordingOptions {
   public:
     // This object must outlive the command.
-    void AddTo(CLI::App& command);
+    void AddTo(Command& command);
 
     bool IsGiven() const { return mode_ || segment_ || pre_ || post_ || mount_ || profile_; }
     // Throws Failure for a duration of another form.

@@ -8,6 +8,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/cli/certificate.h"
+#include "standalone/cli/console.h"
 
 namespace lookhaven::cli {
 
@@ -16,17 +17,17 @@ namespace {
 namespace fs = std::filesystem;
 
 std::string Location(const store::RecordingServer& server, const fs::path& certificate) {
-    return "location ~ \"^/relay/" + std::to_string(server.id) +
-           "/(?<relay_address>[^/]+)/(?<relay_port>[0-9]+)/[0-9]+$\" {\n"
-           "    internal;\n"
-           "    proxy_pass https://$relay_address:$relay_port/webapi$is_args$args;\n"
-           "    proxy_ssl_trusted_certificate \"" +
-           certificate.string() + "\";\n    proxy_ssl_name " + CertificateName(server.certificate) +
-           ";\n    error_page 401 403 500 502 504 =502 /error/no-server;\n}\n";
+    return Concat("location ~ \"^/relay/", server.id,
+                  "/(?<relay_address>[^/]+)/(?<relay_port>[0-9]+)/[0-9]+$\" {\n"
+                  "    internal;\n"
+                  "    proxy_pass https://$relay_address:$relay_port/webapi$is_args$args;\n"
+                  "    proxy_ssl_trusted_certificate \"",
+                  certificate.string(), "\";\n    proxy_ssl_name ", CertificateName(server.certificate),
+                  ";\n    error_page 401 403 500 502 504 =502 /error/no-server;\n}\n");
 }
 
-// One that does not run takes the files when it starts. What it left of its number may be another program's by now.
-void TellWebServer(const fs::path& pid_file) {
+// An nginx that does not run reads the files when it starts. Its stale pid file may name another program by now.
+void ReloadNginx(const fs::path& pid_file) {
     try {
         const int pid = std::stoi(base::ReadFile(pid_file));
         if (pid > 1 && base::ReadFile("/proc/" + std::to_string(pid) + "/comm") == "nginx\n") {
@@ -51,7 +52,7 @@ void WriteRelayConfig(const base::Installation& installation, const std::vector<
         }
     }
     base::WriteFileAtomically(installation.RunFolder() / "relay.conf", config);
-    TellWebServer(installation.RunFolder() / "nginx.pid");
+    ReloadNginx(installation.RunFolder() / "nginx.pid");
 }
 
 }  // namespace lookhaven::cli

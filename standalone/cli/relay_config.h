@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The web server's part in showing cameras of recording servers: where each is, and the certificate it must show.
+// The configuration by which nginx forwards streams from recording servers: where each is, and the certificate it must
+// present.
 #pragma once
 
 #include <vector>
@@ -10,8 +11,8 @@
 
 namespace lookhaven::cli {
 
-// Writes the configuration and the certificates anew, and has a web server that runs take them. Throws std::system_error,
-// Failure.
+// Rewrites the configuration and the certificates, and reloads nginx if it runs. Throws std::system_error, and Failure for
+// a certificate without a host name.
 void WriteRelayConfig(const base::Installation& installation, const std::vector<store::RecordingServer>& servers);
 
 }  // namespace lookhaven::cli

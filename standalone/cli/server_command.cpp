@@ -1,23 +1,22 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven server, set: hosts that show each other's cameras.
+// lookhaven server: hosts that show each other's cameras.
 //
 // Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one that is
-//               to show them: it names the host, its certificate, its cameras and a secret of those two alone.
+//               to show them: the host's address and certificate, its cameras, and a secret that only the two share.
 #include <iostream>
-#include <memory>
-#include <optional>
 
 #include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/cli/certificate.h"
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
 #include "standalone/cli/relay_config.h"
+#include "standalone/cli/table.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
-#include "standalone/store/settings.h"
 
 namespace lookhaven::cli {
 
@@ -35,18 +34,22 @@ struct Request {
     std::string name;
     std::string address;
     int port = kDefaultPort;
-    std::string cms;
 };
 
 Json::Value ToData(const RecordingServer& server) {
-    Json::Value data;
-    data["id"] = server.id;
-    data["name"] = server.name;
-    data["address"] = server.address;
-    data["port"] = server.port;
-    data["enabled"] = server.enabled;
-    return data;
+    return Object("id", server.id, "name", server.name, "address", server.address, "port", server.port, "enabled",
+                  server.enabled);
 }
+
+// A host without an address only connects to this one.
+std::string AddressText(const Json::Value& address) {
+    return address == "" ? "incoming only" : address.asString();
+}
+
+constexpr Column kColumns[] = {
+    {"id", "id"}, {"name", "name"}, {"address", "address", AddressText}, {"port", "port", TextUnlessZero}};
+constexpr Column kCameraColumns[] = {
+    {"id", "id"}, {"name", "name"}, {"server", "server"}, {"id on server", "id_on_server"}};
 
 std::string HostName() {
     char name[256] = "";
@@ -63,7 +66,7 @@ std::vector<RemoteCamera> OwnCameras(store::Store& store) {
     return cameras;
 }
 
-// The text alone goes to standard output, so that it can be sent on as it is.
+// Only the line itself goes to standard output, so that it can be redirected.
 void Pair(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::string certificate =
@@ -75,16 +78,17 @@ void Pair(const Console& console, const Request& request) {
     watcher.id = RecordingServers(store).Add(watcher, offer.secret);
     Json::Value data = ToData(watcher);
     data["text"] = ToText(offer);
-    console.Answer(ToText(offer), data);
+    console.Answer(data, ToText(offer));
     if (!console.json) {
-        std::cerr << "Give this line to \"lookhaven server add\" on " << watcher.name
-                  << ", which may then show every camera of this host. Whoever has it may, so keep it secret.\n";
+        std::cerr
+            << "Enter this line in \"lookhaven server add\" on " << watcher.name
+            << ", which may then show every camera of this host. Keep it secret: anyone who has it may do the same.\n";
     }
 }
 
 std::string ReadPairText() {
     if (::isatty(STDIN_FILENO) != 0) {
-        std::cerr << "The line that lookhaven server pair wrote on the other host: ";
+        std::cerr << "The line from lookhaven server pair on the other host: ";
     }
     std::string line;
     std::getline(std::cin, line);
@@ -93,7 +97,7 @@ std::string ReadPairText() {
 
 void Add(const Console& console, const Request& request) {
     const PairOffer offer = ParsePairText(ReadPairText());
-    CertificateName(offer.certificate);  // refused here, before the web server would be
+    CertificateName(offer.certificate);  // throws before anything is stored
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
     RecordingServer server{.name = request.name,
@@ -111,21 +115,14 @@ void Add(const Console& console, const Request& request) {
         servers.Remove(server.id);
         throw;
     }
-    console.Answer("The server " + server.name + " has the id " + std::to_string(server.id) + ", and " +
-                       std::to_string(offer.cameras.size()) + " cameras.",
-                   ToData(server));
+    console.Answer(ToData(server), "The server ", server.name, " has the id ", server.id, " and ", offer.cameras.size(),
+                   " cameras.");
 }
 
-void List(const Console& console, const Request&) {
+void List(const Console& console) {
     store::Store store = console.OpenStore();
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "address", "port"}};
-    for (const RecordingServer& server : RecordingServers(store).List()) {
-        data.append(ToData(server));
-        rows.push_back({std::to_string(server.id), server.name, server.address.empty() ? "asks only" : server.address,
-                        server.address.empty() ? "" : std::to_string(server.port)});
-    }
-    console.Answer(Table(rows), data);
+    const Json::Value data = Array(RecordingServers(store).List(), ToData);
+    console.Answer(data, Table(kColumns, data));
 }
 
 void Remove(const Console& console, const Request& request) {
@@ -133,69 +130,41 @@ void Remove(const Console& console, const Request& request) {
     RecordingServers servers(store);
     servers.Remove(request.id);
     WriteRelayConfig(console.Installation(), servers.List());
-    Json::Value data;
-    data["id"] = request.id;
-    console.Answer("The server " + std::to_string(request.id) + " is gone, and what was known of its cameras.", data);
+    console.Answer(Object("id", request.id), "The server ", request.id, " was removed, and its cameras with it.");
 }
 
-void ListCameras(const Console& console, const Request&) {
+void ListCameras(const Console& console) {
     store::Store store = console.OpenStore();
-    Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "server", "id there"}};
-    for (const RemoteCamera& camera : RecordingServers(store).ListCameras()) {
-        Json::Value& entry = data.append(Json::objectValue);
-        entry["id"] = camera.id;
-        entry["name"] = camera.name;
-        entry["server"] = camera.server_id;
-        entry["id_on_server"] = camera.id_on_server;
-        rows.push_back({std::to_string(camera.id), camera.name, std::to_string(camera.server_id),
-                        std::to_string(camera.id_on_server)});
-    }
-    console.Answer(Table(rows), data);
+    const Json::Value data = Array(RecordingServers(store).ListCameras(), [](const RemoteCamera& camera) {
+        return Object("id", camera.id, "name", camera.name, "server", camera.server_id, "id_on_server",
+                      camera.id_on_server);
+    });
+    console.Answer(data, Table(kCameraColumns, data));
 }
 
-// For a start of the web server: its part as the store has it.
-void Configure(const Console& console, const Request&) {
+// Run before nginx starts, whose configuration includes what this writes.
+void Configure(const Console& console) {
     store::Store store = console.OpenStore();
     WriteRelayConfig(console.Installation(), RecordingServers(store).List());
 }
 
-void SetCms(const Console& console, const Request& request) {
-    store::Store store = console.OpenStore();
-    store::Settings(store).Set("cms", request.cms);
-    Json::Value data;
-    data["cms"] = request.cms == "on";
-    console.Answer(std::string("This host ") + (request.cms == "on" ? "manages" : "does not manage") +
-                       " its recording servers.",
-                   data);
-}
-
 }  // namespace
 
-void AddServer(CLI::App& program, Console& console) {
-    CLI::App* group = program.add_subcommand("server", "Hosts that show each other's cameras")->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->callback([&console, request, run] { run(console, *request); });
-        return added;
-    };
-    CLI::App* pair = command("pair", "Lets another host show this one's cameras: writes the line for it", Pair);
-    pair->add_option("name", request->name, "What the other host is called here")->required();
-    pair->add_option("--address", request->address, "Where that host reaches this one (else its host name)");
-    pair->add_option("--port", request->port, "The port of this host's HTTPS (else 8443)");
-    CLI::App* add = command("add", "Takes the line of a host whose cameras are to be shown, from standard input", Add);
-    add->add_option("name", request->name, "What the other host is called here")->required();
-    add->add_option("--address", request->address, "Where to reach it (else as its line says)");
-    command("list", "Lists the hosts", List);
-    command("cameras", "Lists the cameras of those hosts with their ids here", ListCameras);
-    command("remove", "Ends a pairing", Remove)->add_option("id", request->id, "The host's id")->required();
-    command("configure", "Writes the web server's part anew", Configure)->group("");
-
-    CLI::App* set = program.add_subcommand("set", "What this host is")->require_subcommand(1);
-    CLI::App* cms = set->add_subcommand("cms", "Whether this host manages its recording servers");
-    cms->add_option("value", request->cms, "on or off")->required()->check(CLI::IsMember({"on", "off"}));
-    cms->callback([&console, request] { SetCms(console, *request); });
+void AddServer(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console, "server", "Hosts that show each other's cameras");
+    Request& request = group.request();
+    const std::string name = "The other host's name here";
+    group.Add("pair", "Lets another host show this one's cameras: prints a line to enter there", Pair)
+        .Option("name", request.name, name, Required)
+        .Option("--address", request.address, "This host's address for the other one (default: its host name)")
+        .Option("--port", request.port, "This host's HTTPS port (default: 8443)");
+    group.Add("add", "Reads the line of a host whose cameras are to be shown from standard input", Add)
+        .Option("name", request.name, name, Required)
+        .Option("--address", request.address, "The other host's address (default: as in the line)");
+    group.Add("list", "Lists the hosts", List);
+    group.Add("cameras", "Lists the cameras of other hosts with their ids here", ListCameras);
+    group.Add("remove", "Ends a pairing", Remove).Option("id", request.id, "The host's id", Required);
+    group.Add("configure", "Rewrites nginx's configuration of these hosts", Configure).Hide();
 }
 
 }  // namespace lookhaven::cli

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven setting: numbers that hold for the whole installation.
-#include <array>
-#include <memory>
+// lookhaven setting, set: what holds for the whole installation.
 #include <string>
 
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/table.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::cli {
@@ -14,52 +14,63 @@ namespace {
 
 struct Setting {
     const char* name;
-    int fallback;
-    int least;
-    int most;
+    int initial;
+    int min;
+    int max;
     const char* meaning;
 };
 
-constexpr std::array<Setting, 2> kSettings = {
-    {{"login_port", 8080, 1, 65535, "the port that clients are told for a direct log-in"},
-     {"players_per_session", 1, 1, 16, "recorded events that one session may play side by side"}}};
+constexpr Setting kSettings[] = {
+    {"login_port", 8080, 1, 65535, "the port that clients are given for a direct log-in"},
+    {"players_per_session", 1, 1, 16, "recorded events that one session may play side by side"}};
 
-struct Change {
+constexpr Column kColumns[] = {{"setting", "setting"}, {"value", "value"}, {"meaning", "meaning"}};
+
+struct Request {
     int value = 0;
+    std::string cms;
 };
 
 void Show(const Console& console) {
     store::Store store = console.OpenStore();
-    store::Settings settings(store);
-    Rows rows{{"SETTING", "VALUE", "MEANING"}};
-    Json::Value data(Json::objectValue);
+    Json::Value data = Json::objectValue;
+    Json::Value rows = Json::arrayValue;
     for (const Setting& setting : kSettings) {
-        const std::string value = settings.Find(setting.name).value_or(std::to_string(setting.fallback));
-        rows.push_back({setting.name, value, setting.meaning});
-        data[setting.name] = value;
+        data[setting.name] = store::Settings(store).Find(setting.name).value_or(std::to_string(setting.initial));
+        rows.append(Object("setting", setting.name, "value", data[setting.name], "meaning", setting.meaning));
     }
-    console.Answer(Table(rows), data);
+    console.Answer(data, Table(kColumns, rows));
+}
+
+void Set(const Console& console, const Setting& setting, int value) {
+    {
+        store::Store store = console.OpenStore();
+        store::Settings(store).Set(setting.name, std::to_string(value));
+    }
+    Show(console);
+}
+
+void SetCms(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    store::Settings(store).Set("cms", request.cms);
+    const bool on = request.cms == "on";
+    console.Answer(Object("cms", on), "This host ", on ? "manages" : "does not manage", " its recording servers.");
 }
 
 }  // namespace
 
-void AddSetting(CLI::App& program, Console& console) {
-    CLI::App* group =
-        program.add_subcommand("setting", "Numbers that hold for the whole installation")->require_subcommand(1);
-    group->add_subcommand("show", "Shows them")->callback([&console] { Show(console); });
-    CLI::App* set = group->add_subcommand("set", "Changes one")->require_subcommand(1);
+void AddSetting(CLI::App& program, const Console& console) {
+    CommandGroup<> group(program, console, "setting", "Numbers that hold for the whole installation");
+    group.Add("show", "Shows all settings", Show);
+    CommandGroup<Request> set(group.app(), console, "set", "Changes a setting");
     for (const Setting& setting : kSettings) {
-        auto change = std::make_shared<Change>();
-        CLI::App* one = set->add_subcommand(setting.name, setting.meaning);
-        one->add_option("value", change->value)->required()->check(CLI::Range(setting.least, setting.most));
-        one->callback([&console, &setting, change] {
-            {
-                store::Store store = console.OpenStore();
-                store::Settings(store).Set(setting.name, std::to_string(change->value));
-            }
-            Show(console);
-        });
+        set.Add(setting.name, setting.meaning,
+                [&setting](const Console& shown_on, const Request& given) { Set(shown_on, setting, given.value); })
+            .Option("value", set.request().value, "", Required, Satisfies(CLI::Range(setting.min, setting.max)));
     }
+    CommandGroup<Request> role(program, console, "set", "The role of this host");
+    role.Add("cms", "Whether this host manages its recording servers", SetCms)
+        .Option("value", role.request().cms, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
 }
 
 }  // namespace lookhaven::cli

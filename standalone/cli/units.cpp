@@ -1,12 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/units.h"
 
-#include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <ctime>
-#include <optional>
-#include <string_view>
 
 #include "standalone/cli/console.h"
 
@@ -14,18 +11,16 @@ namespace lookhaven::cli {
 
 namespace {
 
-constexpr std::int64_t kLargestNumber = std::int64_t{1} << 50;
+constexpr std::int64_t kMaxNumber = std::int64_t{1} << 50;
 
 template <typename Number>
-std::optional<Number> AsNumber(std::string_view text) {
-    Number number{};
-    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-    const bool whole = error == std::errc() && rest == text.data() + text.size();
-    return whole && number >= 0 && number <= static_cast<Number>(kLargestNumber) ? std::optional(number) : std::nullopt;
+std::optional<Number> ParseQuantity(std::string_view text) {
+    const auto number = ParseNumber<Number>(text);
+    return number && *number >= 0 && *number <= static_cast<Number>(kMaxNumber) ? number : std::nullopt;
 }
 
-// The seconds of a date and a time of day; nothing for one that the calendar does not have.
-std::optional<std::int64_t> AsDate(std::string text) {
+// UTC seconds of a date and time; nothing for one that the calendar does not have.
+std::optional<std::int64_t> ParseDate(std::string text) {
     const bool utc = !text.empty() && text.back() == 'Z';
     if (utc) {
         text.pop_back();
@@ -51,8 +46,8 @@ std::int64_t ParseDuration(const std::string& text) {
     const std::size_t digits = text.find_first_not_of("0123456789");
     const std::string unit = digits == std::string::npos ? "s" : text.substr(digits);
     const std::int64_t factor = unit == "s" ? 1 : unit == "m" ? 60 : unit == "h" ? 3600 : unit == "d" ? 86400 : 0;
-    const auto number = AsNumber<std::int64_t>(std::string_view(text).substr(0, digits));
-    if (!number || factor == 0 || *number > kLargestNumber / factor) {
+    const auto number = ParseQuantity<std::int64_t>(std::string_view(text).substr(0, digits));
+    if (!number || factor == 0 || *number > kMaxNumber / factor) {
         throw Failure(kUsage, "a duration looks like 90s, 15m, 2h or 30d");
     }
     return *number * factor;
@@ -62,9 +57,9 @@ std::int64_t ParseSize(const std::string& text) {
     constexpr std::string_view kUnits = "KMGT";
     const std::size_t unit = text.empty() ? std::string::npos : kUnits.find(text.back());
     const bool has_unit = unit != std::string_view::npos;
-    const auto number = AsNumber<double>(std::string_view(text).substr(0, text.size() - (has_unit ? 1 : 0)));
+    const auto number = ParseQuantity<double>(std::string_view(text).substr(0, text.size() - (has_unit ? 1 : 0)));
     const double bytes = number.value_or(-1) * std::pow(1024, has_unit ? static_cast<double>(unit + 1) : 0);
-    if (!(bytes >= 0 && bytes <= static_cast<double>(kLargestNumber))) {
+    if (!(bytes >= 0 && bytes <= static_cast<double>(kMaxNumber))) {
         throw Failure(kUsage, "a size looks like 500M, 4G or 1.5T");
     }
     return static_cast<std::int64_t>(bytes);
@@ -77,10 +72,10 @@ std::int64_t ParseMoment(const std::string& text, std::int64_t now_s) {
     if (text.starts_with('-')) {
         return now_s - ParseDuration(text.substr(1));
     }
-    if (const auto seconds = AsNumber<std::int64_t>(text)) {
+    if (const auto seconds = ParseQuantity<std::int64_t>(text)) {
         return *seconds;
     }
-    const std::optional<std::int64_t> date = AsDate(text);
+    const std::optional<std::int64_t> date = ParseDate(text);
     if (!date || *date < 0) {
         throw Failure(kUsage, "a time looks like 2026-03-01 08:15, 2026-03-01T08:15:30Z, -2h or now");
     }
@@ -102,20 +97,15 @@ std::string FormatDuration(std::int64_t duration_s) {
         const char* name;
         std::int64_t seconds;
     } kUnits[] = {{"d", 86400}, {"h", 3600}, {"m", 60}, {"s", 1}};
-    std::string text;
-    int parts = 0;
-    for (const auto& unit : kUnits) {
-        const std::int64_t count = duration_s / unit.seconds;
-        duration_s %= unit.seconds;
-        if (parts > 0 || count > 0) {
-            ++parts;
-            text += count > 0 ? (text.empty() ? "" : " ") + std::to_string(count) + unit.name : "";
-        }
-        if (parts == 2) {
-            break;
+    for (std::size_t i = 0; i < std::size(kUnits); ++i) {
+        const std::int64_t count = duration_s / kUnits[i].seconds;
+        const std::int64_t rest =
+            i + 1 < std::size(kUnits) ? duration_s % kUnits[i].seconds / kUnits[i + 1].seconds : 0;
+        if (count > 0) {
+            return Concat(count, kUnits[i].name) + (rest > 0 ? Concat(" ", rest, kUnits[i + 1].name) : "");
         }
     }
-    return text.empty() ? "0s" : text;
+    return "0s";
 }
 
 std::string FormatSize(std::int64_t size_bytes) {

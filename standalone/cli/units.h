@@ -3,10 +3,21 @@
 // Times, durations and sizes as operators write and read them.
 #pragma once
 
+#include <charconv>
 #include <cstdint>
+#include <optional>
 #include <string>
+#include <string_view>
 
 namespace lookhaven::cli {
+
+// Nothing unless the whole text is one number.
+template <typename Number>
+std::optional<Number> ParseNumber(std::string_view text) {
+    Number number{};
+    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    return error == std::errc() && rest == text.data() + text.size() ? std::optional(number) : std::nullopt;
+}
 
 // "now"; "-2h" before now; seconds since the epoch; "2026-03-01", "2026-03-01 08:15" or "2026-03-01T08:15:30" in the
 // host's time zone, in UTC with a "Z" behind. UTC seconds. These three throw Failure for another form.

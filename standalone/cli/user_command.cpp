@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven user: accounts and what is denied to them.
+// lookhaven user: accounts and what they are denied.
 #include <algorithm>
+#include <functional>
 #include <map>
-#include <memory>
 #include <optional>
 
+#include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/table.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/users.h"
@@ -21,9 +23,9 @@ using store::Privilege;
 using store::User;
 using store::Users;
 
-const std::map<std::string, Privilege> kPrivileges = {
+const Names<Privilege> kPrivileges = {
     {"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}};
-const std::map<std::string, CameraAccess> kAccess = {
+const Names<CameraAccess> kAccess = {
     {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
 
 struct ItemKind {
@@ -42,104 +44,99 @@ struct Request {
     Privilege privilege = Privilege::kViewer;
     std::optional<int> camera;
     std::optional<int> group;
-    std::map<DeniableItem, int> items;  // at most one is taken
+    std::map<DeniableItem, std::optional<int>> items;
     std::vector<CameraAccess> kinds;
 };
 
-std::string PrivilegeName(Privilege privilege) {
-    return std::find_if(kPrivileges.begin(), kPrivileges.end(),
-                        [privilege](const auto& entry) { return entry.second == privilege; })
-        ->first;
+std::string PrivilegeName(const Json::Value& privilege) {
+    return NameOf(kPrivileges, privilege.asInt());
 }
 
-User Require(Users& users, const std::string& name) {
-    const std::optional<User> user = users.FindByName(name);
-    if (!user) {
-        throw Failure(kNoInput, "there is no such account: lookhaven user list names them");
-    }
-    return *user;
+User RequireUser(Users& users, const std::string& name) {
+    return Require(users.FindByName(name), "there is no such account: see lookhaven user list");
 }
 
 Json::Value ToData(const User& user) {
-    Json::Value data;
-    data["id"] = user.id;
-    data["name"] = user.name;
-    data["privilege"] = static_cast<int>(user.privilege);
-    return data;
+    return Object("id", user.id, "name", user.name, "privilege", static_cast<int>(user.privilege));
 }
 
-void Add(const Console& console, const Request& request) {
-    store::Store store = console.OpenStore();
-    const User user = Users(store).Add(request.name, ReadPassword(request.name, true), request.privilege);
-    console.Answer("The account " + user.name + " may log in as " + PrivilegeName(user.privilege) + ".", ToData(user));
+Json::Value Ids(const std::set<int>& ids) {
+    return Array(ids, std::identity());
 }
 
-// "live 1 2; audio 2"
-std::string DeniedText(Users& users, int user, std::set<int> (Users::*denied)(int, CameraAccess), Json::Value& data) {
+void Append(std::string& text, const std::string& name, const Json::Value& ids) {
+    if (!ids.empty()) {
+        text += (text.empty() ? "" : "; ") + name + " " + PlainText(ids);
+    }
+}
+
+// "audio 2; live 1 2"
+std::string DeniedAccessText(const Json::Value& denied) {
     std::string text;
     for (const auto& [name, kind] : kAccess) {
-        data[name] = Json::arrayValue;
-        std::string ids;
-        for (const int id : (users.*denied)(user, kind)) {
-            data[name].append(id);
-            ids += " " + std::to_string(id);
-        }
-        text += ids.empty() ? "" : (text.empty() ? "" : "; ") + name + ids;
+        Append(text, name, denied[name]);
     }
     return text;
 }
 
 // "e-map 1 2; door 4"
-std::string DeniedItemsText(Users& users, int user, Json::Value& data) {
+std::string DeniedItemsText(const Json::Value& user) {
     std::string text;
     for (const ItemKind& kind : kItems) {
-        data[kind.key] = Json::arrayValue;
-        std::string ids;
-        for (const int id : users.DeniedItems(user, kind.kind)) {
-            data[kind.key].append(id);
-            ids += " " + std::to_string(id);
-        }
-        text += ids.empty() ? "" : (text.empty() ? "" : "; ") + (kind.name + ids);
+        Append(text, kind.name, user[kind.key]);
     }
     return text;
+}
+
+constexpr Column kColumns[] = {{"id", "id"},
+                               {"name", "name"},
+                               {"privilege", "privilege", PrivilegeName},
+                               {"denied cameras", "denied", DeniedAccessText},
+                               {"denied groups", "denied_groups", DeniedAccessText},
+                               {"other denied items", "", DeniedItemsText}};
+
+void Add(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const Json::Value user =
+        ToData(Users(store).Add(request.name, ReadPassword(request.name, true), request.privilege));
+    console.Answer(user, "The account ", request.name, " was added as ", PrivilegeName(user["privilege"]), ".");
 }
 
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     Users users(store);
     Json::Value data = Json::arrayValue;
-    Rows rows = {{"id", "name", "privilege", "denied cameras", "denied groups", "denied else"}};
     for (const User& user : users.List()) {
-        Json::Value entry = ToData(user);
-        rows.push_back({std::to_string(user.id), user.name, PrivilegeName(user.privilege),
-                        DeniedText(users, user.id, &Users::DeniedCameras, entry["denied"]),
-                        DeniedText(users, user.id, &Users::DeniedGroups, entry["denied_groups"]),
-                        DeniedItemsText(users, user.id, entry)});
-        data.append(entry);
+        Json::Value& entry = data.append(ToData(user));
+        for (const auto& [name, kind] : kAccess) {
+            entry["denied"][name] = Ids(users.DeniedCameras(user.id, kind));
+            entry["denied_groups"][name] = Ids(users.DeniedGroups(user.id, kind));
+        }
+        for (const ItemKind& kind : kItems) {
+            entry[kind.key] = Ids(users.DeniedItems(user.id, kind.kind));
+        }
     }
-    console.Answer(Table(rows), data);
+    console.Answer(data, Table(kColumns, data));
 }
 
 void SetPassword(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Users users(store);
-    const User user = Require(users, request.name);
+    const User user = RequireUser(users, request.name);
     users.SetPassword(user.id, ReadPassword(user.name, true));
-    console.Answer("The account " + user.name + " has a new password and is logged out everywhere.", ToData(user));
+    console.Answer(ToData(user), "The account ", user.name, " has a new password and is logged out everywhere.");
 }
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Users users(store);
-    const User user = Require(users, request.name);
+    const User user = RequireUser(users, request.name);
     const std::vector<User> all = users.List();
-    const auto owners =
-        std::count_if(all.begin(), all.end(), [](const User& other) { return other.privilege == Privilege::kOwner; });
-    if (user.privilege == Privilege::kOwner && owners == 1) {
-        throw Failure(kDataError, user.name + " is the only owner: make another one first");
+    if (user.privilege == Privilege::kOwner && std::ranges::count(all, Privilege::kOwner, &User::privilege) == 1) {
+        throw Failure(kDataError, user.name, " is the only owner: add another one first");
     }
     users.Remove(user.id);
-    console.Answer("The account " + user.name + " is gone.", ToData(user));
+    console.Answer(ToData(user), "The account ", user.name, " was removed.");
 }
 
 void PermitKind(Users& users, int user, const Request& request, bool allow, CameraAccess kind) {
@@ -152,12 +149,12 @@ void PermitKind(Users& users, int user, const Request& request, bool allow, Came
 
 void RequireCamera(store::Store& store, int id) {
     if (!store::Cameras(store).Find(id) && !store::RecordingServers(store).FindCamera(id)) {
-        throw Failure(kNoInput, "there is no camera " + std::to_string(id) + ": lookhaven camera list names them");
+        throw Failure(kNoInput, "there is no camera ", id, ": see lookhaven camera list");
     }
 }
 
-// Of a camera or group; the sentence's rest.
-std::string PermitCamera(store::Store& store, int user, const Request& request, bool allow) {
+// Of a camera or group; returns the end of the answer.
+std::string PermitAccess(store::Store& store, int user, const Request& request, bool allow) {
     if (!allow && request.camera) {
         RequireCamera(store, *request.camera);
     }
@@ -171,65 +168,71 @@ std::string PermitCamera(store::Store& store, int user, const Request& request, 
     return still_denied ? ", but belongs to a group that is denied." : ".";
 }
 
-std::string Subject(const Request& request) {
-    for (const ItemKind& kind : kItems) {
-        if (const auto item = request.items.find(kind.kind); item != request.items.end()) {
-            return kind.name + std::string(" ") + std::to_string(item->second);
-        }
-    }
-    return request.group ? "group " + std::to_string(*request.group) : "camera " + std::to_string(*request.camera);
+// The item that the request names; null when it names a camera or group.
+const ItemKind* NamedItem(const Request& request) {
+    const auto* kind =
+        std::ranges::find_if(kItems, [&](const ItemKind& each) { return request.items.at(each.kind).has_value(); });
+    return kind == std::end(kItems) ? nullptr : kind;
 }
 
 void Permit(const Console& console, const Request& request, bool allow) {
-    if ((request.camera ? 1U : 0U) + (request.group ? 1U : 0U) + request.items.size() != 1) {
+    const auto item_count =
+        std::ranges::count_if(request.items, [](const auto& item) { return item.second.has_value(); });
+    if ((request.camera ? 1 : 0) + (request.group ? 1 : 0) + item_count != 1) {
         throw Failure(kUsage, "name one camera, group, e-map, door or I/O module: see lookhaven user deny --help");
     }
-    if (!request.items.empty() && !request.kinds.empty()) {
-        throw Failure(kUsage, "a kind of access is one to cameras and groups: leave --kind out");
+    const ItemKind* item = NamedItem(request);
+    if (item != nullptr && !request.kinds.empty()) {
+        throw Failure(kUsage, "only access to cameras and groups has a kind: leave out --kind");
     }
     store::Store store = console.OpenStore();
     Users users(store);
-    const User user = Require(users, request.name);
-    std::string rest = ".";
-    if (request.items.empty()) {
-        rest = PermitCamera(store, user.id, request, allow);
+    const User user = RequireUser(users, request.name);
+    std::string subject = request.camera ? Concat("camera ", *request.camera) : "";
+    std::string end = ".";
+    if (item != nullptr) {
+        const int id = *request.items.at(item->kind);
+        subject = Concat(item->name, " ", id);
+        allow ? users.AllowItem(user.id, item->kind, id) : users.DenyItem(user.id, item->kind, id);
     } else {
-        const auto [kind, item] = *request.items.begin();
-        allow ? users.AllowItem(user.id, kind, item) : users.DenyItem(user.id, kind, item);
+        subject = request.group ? Concat("group ", *request.group) : subject;
+        end = PermitAccess(store, user.id, request, allow);
     }
-    console.Answer("The " + Subject(request) + (allow ? " is allowed to " : " is denied to ") + user.name + rest,
-                   ToData(user));
+    console.Answer(ToData(user), "The ", subject, allow ? " is allowed to " : " is denied to ", user.name, end);
+}
+
+void Deny(const Console& console, const Request& request) {
+    Permit(console, request, false);
+}
+
+void Allow(const Console& console, const Request& request) {
+    Permit(console, request, true);
 }
 
 }  // namespace
 
-void AddUser(CLI::App& program, Console& console) {
-    CLI::App* group = program.add_subcommand("user", "Accounts and their rights")->require_subcommand(1);
-    auto request = std::make_shared<Request>();
-    const auto command = [&](const char* name, const char* purpose, void (*run)(const Console&, const Request&)) {
-        CLI::App* added = group->add_subcommand(name, purpose);
-        added->add_option("name", request->name, "The account")->required();
-        added->callback([&console, request, run] { run(console, *request); });
-        return added;
+void AddUser(CLI::App& program, const Console& console) {
+    CommandGroup<Request> group(program, console, "user", "Accounts and their rights");
+    Request& request = group.request();
+    const auto add_command = [&](const char* verb, const char* description,
+                                 void (*run)(const Console&, const Request&)) {
+        return group.Add(verb, description, run).Option("name", request.name, "The account's name", Required);
     };
-    CLI::App* add = command("add", "Makes an account; its password is asked for", Add);
-    Choose(add->add_option("--privilege", request->privilege, "How much it may do (else viewer)"), kPrivileges);
-    group->add_subcommand("list", "Lists the accounts")->callback([&console] { List(console); });
-    command("passwd", "Changes a password and ends the account's sessions", SetPassword);
-    command("remove", "Removes an account and ends its sessions", Remove);
-    for (CLI::App* permit :
-         {command("deny", "Denies one thing and ends the account's sessions",
-                  [](const Console&c, const Request&r) { Permit(c, r, false); }),
-          command("allow", "Allows it again", [](const Console&c, const Request&r) { Permit(c, r, true); })}) {
-        permit->add_option("camera", request->camera, "The camera's id");
-        permit->add_option("--group", request->group, "A group's id instead: all that its cameras are and will be");
-        for (const ItemKind& kind : kItems) {
-            permit->add_option_function<int>(
-                kind.option, [request, &kind](int id) { request->items[kind.kind] = id; },
-                std::string("An id instead: ") + kind.name);
+    add_command("add", "Adds an account; prompts for its password", Add)
+        .Option("--privilege", request.privilege, "Its privilege (default: viewer)", OneOf(kPrivileges));
+    group.Add("list", "Lists the accounts", List);
+    add_command("passwd", "Changes a password and ends the account's sessions", SetPassword);
+    add_command("remove", "Removes an account and ends its sessions", Remove);
+    for (Command command : {add_command("deny", "Denies one thing and ends the account's sessions", Deny),
+                            add_command("allow", "Allows what was denied", Allow)}) {
+        command.Option("camera", request.camera, "A camera's id")
+            .Option("--group", request.group, "Instead of a camera, all cameras of this group, now and later");
+        for (const ItemKind& item : kItems) {
+            command.Option(item.option, request.items[item.kind],
+                           std::string("Instead of a camera, this ") + item.name);
         }
-        Choose(permit->add_option("--kind", request->kinds, "What exactly; may be repeated (else everything)"), kAccess)
-            ->allow_extra_args(false);
+        command.Option("--kind", request.kinds, "The kind of access; may be repeated (default: all)", OneOf(kAccess),
+                       Repeatable);
     }
 }
 

@@ -60,10 +60,10 @@ class FakeHost {
     std::thread thread_;
 };
 
-class DoctorTest : public CliTest {
+class DoctorTest : public DemoTest {
   protected:
     void SetUp() override {
-        SetUpDemo();
+        DemoTest::SetUp();
         host_ = std::make_unique<FakeHost>(home_ / "run" / "webapi.sock", true);
     }
 

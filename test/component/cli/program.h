@@ -20,24 +20,24 @@ struct Outcome {
     std::string text;  // standard output and standard error
 };
 
-// One line of a session and what must come of it; an empty text is not looked for.
+// A command line and what it must answer; an empty text is not looked for.
 struct Row {
     std::string line;
-    std::string input;
     int code;
     std::string has;
-    std::string has_not;
+    std::string has_not = {};
+    std::string input = {};
 };
 
 class CliTest : public testing::Test {
   protected:
     CliTest();
 
-    // A line as in a shell, cut at blanks, where '…' keeps blanks. as_nobody: by a user who owns nothing.
+    // A line as in a shell, split at blanks, where '…' keeps blanks. as_nobody: as a user who owns nothing.
     Outcome Run(const std::string& line, const std::string& input = "", bool as_nobody = false);
-    // The same on a terminal, where the answers are typed as each prompt shows.
+    // The same on a terminal, where each answer is typed at its prompt.
     Outcome RunOnTerminal(const std::string& line, const std::vector<std::string>& answers);
-    // Runs line after line. What fails answers in one sentence, and no password ever shows.
+    // Runs line after line. A failure answers in one sentence, and no password is ever printed.
     void Play(const std::vector<Row>& rows);
 
     // An installation with an owner "admin" and a viewer, their passwords as below, and the demo's cameras.
@@ -50,6 +50,11 @@ class CliTest : public testing::Test {
 
     test::TemporaryFolder folder_;
     std::filesystem::path home_;
+};
+
+class DemoTest : public CliTest {
+  protected:
+    void SetUp() override { SetUpDemo(); }
 };
 
 }  // namespace lookhaven::cli

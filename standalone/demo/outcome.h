@@ -1,13 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Why the demo cannot be made here.
+// How many events the demo made, or why it could not make them.
 #pragma once
 
 #include <stdexcept>
 
 namespace lookhaven::demo {
 
-// The installation lacks what the demo is built on; one sentence for the operator. Nothing was changed.
+struct EventCounts {
+    int events = 0;
+    int marks = 0;
+};
+
+// The installation lacks what the demo needs; one sentence for the operator. Nothing was changed.
 class NotReady : public std::runtime_error {
   public:
     using std::runtime_error::runtime_error;

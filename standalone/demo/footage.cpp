@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/demo/demo_footage.h"
+#include "standalone/demo/footage.h"
 
 #include <filesystem>
 #include <memory>
@@ -10,7 +10,7 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/archive/repair.h"
-#include "standalone/demo/not_ready.h"
+#include "standalone/demo/outcome.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/salvage.h"
@@ -30,7 +30,7 @@ namespace {
 constexpr std::int64_t kHour = 3600;
 constexpr std::int64_t kSceneAgesS[] = {71 * kHour, 46 * kHour, 25 * kHour, 3 * kHour};
 constexpr int kSceneSeconds = 20;
-constexpr int kMarkAfterS = 6;  // so that the footage of a mark lies inside
+constexpr int kMarkOffsetS = 6;  // the footage of a mark lies within the scene
 const pattern::PatternSettings kSettings = {.width = 640, .height = 360, .fps = 25, .gop = 25, .quality = 80};
 
 class SceneRecorder {
@@ -50,7 +50,7 @@ class SceneRecorder {
         for (int i = 0; i < kSceneSeconds * kSettings.fps; ++i) {
             const std::int64_t time_us = i * std::int64_t{1'000'000} / kSettings.fps;
             const pattern::Picture& picture = scene_.Draw(i, start_s * 1000 + time_us / 1000);
-            // The numbers go on over all scenes, since the encoder counts its key frames by them.
+            // Frame numbers continue from scene to scene, since the encoder places key frames by them.
             const pattern::EncodedPicture encoded = encoder_->Encode(picture, number_++);
             if (!writer) {
                 writer.emplace(file, media::MediaFormat{encoder_->Format(), AudioFormat()}, start_s * 1000,
@@ -89,30 +89,31 @@ bool HasEvents(store::Events& events, int camera) {
     return !events.List(filter).empty();
 }
 
-void AddMark(store::Store& store, int camera, std::int64_t moment_s, bool is_sale) {
+void AddMark(store::Store& store, int camera, std::int64_t moment_s, bool is_transaction) {
     store::Marks marks(store);
-    const store::Mark mark = is_sale ? marks.Add(store::MarkKind::kPos, camera, moment_s, 2,
-                                                 "2 x Coffee  6.40\n1 x Cake  4.10\nTotal  10.50")
-                                     : marks.Add(store::MarkKind::kAlert, camera, moment_s, 2, "Somebody at the door");
+    const store::Mark mark =
+        is_transaction
+            ? marks.Add(store::MarkKind::kPos, camera, moment_s, 2, "2 x Coffee  6.40\n1 x Cake  4.10\nTotal  10.50")
+            : marks.Add(store::MarkKind::kAlert, camera, moment_s, 2, "Somebody at the door");
     maintenance::SaveMark(store, mark);
 }
 
 }  // namespace
 
-DemoFootage RecordDemoFootage(store::Store& store, std::int64_t now_s) {
+EventCounts RecordFootage(store::Store& store, std::int64_t now_s) {
     const std::optional<store::Mount> mount = store::Mounts(store).FindForPlan(0);
     if (!mount || !maintenance::MountFolder::Open(mount->path, mount->id)) {
-        throw NotReady("there is no mount to record to: lookhaven init makes one");
+        throw NotReady("there is no mount to record to: run lookhaven init");
     }
     store::Events events(store);
-    DemoFootage made;
+    EventCounts counts;
     for (const store::Camera& camera : store::Cameras(store).List()) {
         if (!IsRecordedPattern(camera, store::RecordingPlans(store).Find(camera.id)) || HasEvents(events, camera.id)) {
             continue;
         }
         SceneRecorder recorder(camera);
         for (const std::int64_t age_s : kSceneAgesS) {
-            const std::int64_t start_s = now_s - age_s - made.events * 600;
+            const std::int64_t start_s = now_s - age_s - counts.events * 600;
             const archive::FileName name{camera.id, start_s, events.NextId(), archive::FileKind::kRecording};
             archive::MakeFolderFor(mount->path, name);
             const std::filesystem::path file = std::filesystem::path(mount->path) / archive::PathOf(name);
@@ -120,12 +121,12 @@ DemoFootage RecordDemoFootage(store::Store& store, std::int64_t now_s) {
             archive::WriteRecordingLog(std::filesystem::path(mount->path) / std::to_string(camera.id), start_s,
                                        start_s + kSceneSeconds, base::kReasonContinuous);
             events.Begin(maintenance::RowOf(name, mount->id, archive::CloseCrashed(file)));
-            AddMark(store, camera.id, start_s + kMarkAfterS, made.marks % 2 == 1);
-            ++made.events;
-            ++made.marks;
+            AddMark(store, camera.id, start_s + kMarkOffsetS, counts.marks % 2 == 1);
+            ++counts.events;
+            ++counts.marks;
         }
     }
-    return made;
+    return counts;
 }
 
 }  // namespace lookhaven::demo

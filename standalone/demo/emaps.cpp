@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/demo/demo_emaps.h"
+#include "standalone/demo/emaps.h"
 
 #include <vector>
 
 #include "standalone/base/clock.h"
-#include "standalone/demo/demo_floor_plans.h"
-#include "standalone/store/devices.h"
+#include "standalone/demo/floor_plans.h"
 #include "standalone/emap/pictures.h"
+#include "standalone/store/devices.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/users.h"
 
@@ -25,7 +25,7 @@ struct Ids {
     int front_door = 0;
     int back_door = 0;
     int io = 0;
-    int till = 0;
+    int pos = 0;
 };
 
 Ids AddDevices(store::Store& store, const std::map<std::string, int>& cameras) {
@@ -37,7 +37,7 @@ Ids AddDevices(store::Store& store, const std::map<std::string, int>& cameras) {
     ids.io = devices.Add({.kind = EmapItemType::kIoModule,
                           .name = "Plant room",
                           .ports = {{0, {PortType::kInput, cameras.at("Parking")}}, {1, {PortType::kOutput, 0}}}});
-    ids.till = devices.Add({.kind = EmapItemType::kPos, .name = "Till", .camera_id = cameras.at("Entrance")});
+    ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = "Till", .camera_id = cameras.at("Entrance")});
     devices.SetCameraPorts(cameras.at("Entrance"), {1, 1});
     const std::int64_t now_s = base::WallMillis() / 1000;
     devices.Report({EmapItemType::kDoor, ids.front_door, -1, "closed", now_s});
@@ -58,7 +58,7 @@ std::vector<EmapItem> GroundFloor(const Ids& ids, const std::map<std::string, in
             item(EmapItemType::kDoor, ids.back_door, "Loading door", 740, 160),
             item(EmapItemType::kIoModule, ids.io, "Smoke alarm", 190, 190, 0, 0),
             item(EmapItemType::kIoModule, ids.io, "Ventilation", 280, 190, 0, 1),
-            item(EmapItemType::kPos, ids.till, "Till", 540, 430),
+            item(EmapItemType::kPos, ids.pos, "Till", 540, 430),
             item(EmapItemType::kEmap, ids.upper, "Upper floor", 220, 590)};
 }
 
@@ -81,8 +81,8 @@ void Place(store::Store& store, int map, const std::vector<EmapItem>& items) {
 
 }  // namespace
 
-int AddDemoEmaps(store::Store& store, const std::filesystem::path& home, const std::map<std::string, int>& cameras,
-                 int viewer) {
+int AddEmaps(store::Store& store, const std::filesystem::path& home, const std::map<std::string, int>& cameras,
+             int viewer) {
     if (!store::Emaps(store).List().empty()) {
         return 0;
     }
@@ -91,9 +91,7 @@ int AddDemoEmaps(store::Store& store, const std::filesystem::path& home, const s
     ids.upper = AddMap(store, home, "Upper floor", kUpperFloorPlan);
     Place(store, ids.ground, GroundFloor(ids, cameras));
     Place(store, ids.upper, UpperFloor(ids, cameras));
-    if (viewer != 0) {
-        store::Users(store).DenyItem(viewer, store::DeniableItem::kDoor, ids.back_door);
-    }
+    store::Users(store).DenyItem(viewer, store::DeniableItem::kDoor, ids.back_door);
     return 2;
 }
 

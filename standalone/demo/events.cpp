@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/demo/demo_events.h"
+#include "standalone/demo/events.h"
 
 #include <algorithm>
 #include <random>
 #include <vector>
 
 #include "standalone/archive/layout.h"
-#include "standalone/demo/not_ready.h"
+#include "standalone/demo/outcome.h"
 #include "standalone/media/packet.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -20,20 +20,20 @@ using store::Event;
 using store::Mark;
 
 constexpr std::int64_t kDaySeconds = 86400;
-constexpr std::size_t kRowsAtOnce = 20'000;
+constexpr std::size_t kRowsPerTransaction = 20'000;
 constexpr int kEventsPerMark = 50;
 
-class Inventor {
+class EventGenerator {
   public:
-    // slot_s: the seconds that one event of a camera has for itself, at least 1.
-    Inventor(int mount_id, double slot_s) : mount_id_(mount_id), slot_s_(slot_s) {}
+    // slot_s: the time that each event of a camera has to itself, at least 1.
+    EventGenerator(int mount_id, double slot_s) : mount_id_(mount_id), slot_s_(slot_s) {}
 
     Event MakeEvent(const store::Camera& camera, std::int64_t slot_start_s, int number) {
-        const std::int64_t longest = std::clamp<std::int64_t>(static_cast<std::int64_t>(slot_s_), 1, 600);
+        const std::int64_t max_length = std::clamp<std::int64_t>(static_cast<std::int64_t>(slot_s_), 1, 600);
         Event event;
         event.camera_id = camera.id;
         event.mount_id = mount_id_;
-        const std::int64_t length = Draw(std::max<std::int64_t>(longest / 4, 1), longest);
+        const std::int64_t length = Draw(std::max<std::int64_t>(max_length / 4, 1), max_length);
         event.start_s = slot_start_s + Draw(0, std::max<std::int64_t>(static_cast<std::int64_t>(slot_s_) - length, 0));
         event.end_s = event.start_s + length;
         event.reason = Draw(0, 9) == 0 ? base::kReasonAlarm : base::kReasonContinuous;
@@ -74,30 +74,30 @@ class Inventor {
 
 }  // namespace
 
-DemoAmount AddDemoEvents(store::Store& store, int count, int days, std::int64_t now_s) {
+EventCounts GenerateEvents(store::Store& store, int count, int days, std::int64_t now_s) {
     const std::vector<store::Camera> cameras = store::Cameras(store).List();
     const auto mount = store::Mounts(store).FindForPlan(0);
     if (cameras.empty() || !mount) {
-        throw NotReady("events need a camera and a mount: lookhaven demo setup makes them");
+        throw NotReady("events need a camera and a mount: run lookhaven demo setup");
     }
     const auto camera_count = static_cast<int>(cameras.size());
     const int per_camera = (count + camera_count - 1) / camera_count;
     const double span_s = static_cast<double>(days) * kDaySeconds;
     const double slot_s = span_s / per_camera;
     if (slot_s < 1 || now_s < days * kDaySeconds) {
-        throw std::invalid_argument("so many events do not fit into so few days, or the days begin before 1970");
+        throw std::invalid_argument("that many events do not fit into that many days, or the days begin before 1970");
     }
-    Inventor inventor(mount->id, slot_s);
+    EventGenerator generator(mount->id, slot_s);
     store::Events events(store);
     store::Marks marks(store);
     std::vector<Event> new_events;
     std::vector<Mark> new_marks;
-    DemoAmount made;
-    const auto put = [&] {
+    EventCounts counts;
+    const auto flush = [&] {
         events.AddAll(new_events);
         marks.AddAll(new_marks);
-        made.events += static_cast<int>(new_events.size());
-        made.marks += static_cast<int>(new_marks.size());
+        counts.events += static_cast<int>(new_events.size());
+        counts.marks += static_cast<int>(new_marks.size());
         new_events.clear();
         new_marks.clear();
     };
@@ -105,16 +105,16 @@ DemoAmount AddDemoEvents(store::Store& store, int count, int days, std::int64_t 
         const int slot = i / camera_count;
         const auto offset_s = static_cast<std::int64_t>(slot * slot_s - span_s);
         const store::Camera& camera = cameras[static_cast<std::size_t>(i % camera_count)];
-        new_events.push_back(inventor.MakeEvent(camera, now_s + offset_s, i + 1));
+        new_events.push_back(generator.MakeEvent(camera, now_s + offset_s, i + 1));
         if (i % kEventsPerMark == kEventsPerMark - 1) {
-            new_marks.push_back(inventor.MakeMark(new_events.back()));
+            new_marks.push_back(generator.MakeMark(new_events.back()));
         }
-        if (new_events.size() == kRowsAtOnce) {
-            put();
+        if (new_events.size() == kRowsPerTransaction) {
+            flush();
         }
     }
-    put();
-    return made;
+    flush();
+    return counts;
 }
 
 }  // namespace lookhaven::demo

@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Two floor plans with something of every kind on them.
+#pragma once
+
+#include <filesystem>
+#include <map>
+#include <string>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::demo {
+
+// Adds the maps with their doors, I/O module and POS terminal unless there are maps already, and denies the viewer the
+// second door; returns how many maps were added. cameras: ids by name. viewer: the account's id.
+int AddEmaps(store::Store& store, const std::filesystem::path& home, const std::map<std::string, int>& cameras,
+             int viewer);
+
+}  // namespace lookhaven::demo
