@@ -117,7 +117,7 @@ TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
         const auto records = [&] {
             return std::ranges::any_of(Open(), [&](const store::Event& row) { return !died_ms.contains(row.path); });
         };
-        ASSERT_TRUE(kill % 2 == 0 || Eventually(records, seconds(60))) << Log();
+        ASSERT_TRUE(kill % 2 == 0 || Eventually(seconds(60), records)) << Log();
         std::this_thread::sleep_for(milliseconds(random() % 1600));
         recorder.Signal(SIGKILL);
         ASSERT_TRUE(recorder.Wait());
