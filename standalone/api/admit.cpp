@@ -2,6 +2,7 @@
 #include "standalone/api/admit.h"
 
 #include "standalone/base/clock.h"
+#include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/sessions.h"
 
@@ -9,7 +10,7 @@ namespace lookhaven::api {
 
 namespace {
 
-// Looks at its callers itself; every other API of a module needs a session.
+// Authenticates its callers itself; every other API of a module needs a session.
 constexpr const char* kSelfAdmittingApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
 // A GET has effects too: it starts streams, costs work, and plays sound.
@@ -48,7 +49,11 @@ std::optional<binding::Login> FindLogin(const Call& call) {
     if (!session) {
         return std::nullopt;
     }
-    sessions.Touch(*session, now_s);
+    try {
+        sessions.Touch(*session, now_s);
+    } catch (const store::StoreError& error) {  // a store that can only be read is no reason to refuse what only reads
+        base::LogWarning(std::string("cannot note that a session is in use: ") + error.what());
+    }
     return binding::Login{static_cast<unsigned int>(session->user.id), session->user.name, session->handle,
                           session->user.IsManager()};
 }

@@ -19,7 +19,7 @@ void CheckOrigin(const http::Request& request);
 std::optional<binding::Login> FindLogin(const Call& call);
 
 // Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure
-// 401 without a session, except at the API that admits by itself; 503 when max_requests of the session run already.
+// 401 without a session, except at the API that authenticates its callers itself; 503 when max_requests of the session run already.
 void Admit(const Call& call, std::size_t max_requests);
 
 }  // namespace lookhaven::api

@@ -36,10 +36,12 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
     return data;
 }
 
-// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
+// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use. All
+// machines of a link share its link-local network.
 std::string NetworkOf(std::string_view address) {
     in6_addr bytes{};
-    if (::inet_pton(AF_INET6, std::string(address).c_str(), &bytes) != 1 || IN6_IS_ADDR_V4MAPPED(&bytes)) {
+    if (::inet_pton(AF_INET6, std::string(address).c_str(), &bytes) != 1 || IN6_IS_ADDR_V4MAPPED(&bytes) ||
+        IN6_IS_ADDR_LINKLOCAL(&bytes)) {
         return std::string(address);
     }
     std::fill(std::begin(bytes.s6_addr) + 8, std::end(bytes.s6_addr), std::uint8_t{0});
@@ -51,7 +53,7 @@ std::string LogIn(const Call& call) {
     store::Store& records = call.Records();
     const Parameters query = ReadQuery(call.request);
     if (query.contains("account") || query.contains("password")) {
-        throw Failure(400, "account and password belong into the body: addresses end up in logs and histories");
+        throw Failure(400, "account and password belong in the body: URLs end up in logs and browser histories");
     }
     const std::string account = call.Parameter("account").asString();
     const std::string address = NetworkOf(call.request.Header("REMOTE_ADDR"));
@@ -64,9 +66,13 @@ std::string LogIn(const Call& call) {
         throw Failure(401, "wrong account or password");
     }
     throttle.Clear(account, address);
-    const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
-    return SuccessAnswer(Identity(records, user->name, user->id, user->IsManager()),
-                         CookieLine(call.request, session.secret));
+    try {
+        const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
+        return SuccessAnswer(Identity(records, user->name, user->id, user->IsManager()),
+                             CookieLine(call.request, session.secret));
+    } catch (const store::NotFound&) {  // removed, or its password changed, in this moment
+        throw Failure(401, "wrong account or password");
+    }
 }
 
 const binding::Login& RequireLogin(const Call& call) {

@@ -8,9 +8,9 @@ const Json::Value& Call::Parameter(const std::string& name) const {
     return found == parameters.end() ? Json::Value::nullSingleton() : found->second;
 }
 
-std::int64_t Call::NumberOr(const std::string& name, std::int64_t otherwise) const {
+std::int64_t Call::NumberOr(const std::string& name, std::int64_t fallback) const {
     const Json::Value& value = Parameter(name);
-    return value.isNull() ? otherwise : value.asInt64();
+    return value.isNull() ? fallback : value.asInt64();
 }
 
 std::string SuccessAnswer(const Json::Value& data, const std::string& extra) {

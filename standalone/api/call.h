@@ -36,12 +36,12 @@ struct Call {
 
     // The parameter's value; null when it is missing.
     const Json::Value& Parameter(const std::string& name) const;
-    // The parameter's number, otherwise when it is missing. Throws Json::Exception for what is no number.
-    std::int64_t NumberOr(const std::string& name, std::int64_t otherwise) const;
+    // The parameter's number, or fallback when it is missing. Throws Json::Exception for what is no number.
+    std::int64_t NumberOr(const std::string& name, std::int64_t fallback) const;
     store::Store& Records() const { return context.Records(); }
 };
 
-// {"success": true, "data": data}. extra: further head lines, each ending in CR LF.
+// {"success": true, "data": data}. extra: further header lines, each ending in CR LF.
 std::string SuccessAnswer(const Json::Value& data, const std::string& extra = "");
 
 }  // namespace lookhaven::api

@@ -7,9 +7,9 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
+#include "standalone/emap/item_json.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/devices.h"
-#include "standalone/emap/item_json.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/servers.h"
 
@@ -51,8 +51,7 @@ std::string SaveItems(const Call& call) {
         emap.small_items = small.asBool();
     }
     Json::Value data;
-    data["revision"] =
-        store::Emaps(call.Records()).ReplaceItems(emap, emap::ItemsFromJson(call.Parameter("items")));
+    data["revision"] = store::Emaps(call.Records()).ReplaceItems(emap, emap::ItemsFromJson(call.Parameter("items")));
     return SuccessAnswer(data);
 }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The web API modules that the host has loaded, and which of their functions serves a method.
+// The loaded web API modules, and which of their functions serves a method.
 #pragma once
 
 #include <filesystem>

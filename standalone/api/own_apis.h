@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The APIs that the host itself serves, beside those of its modules: a table each, in a file each.
+// The APIs of the standalone platform, beside those of the loaded modules: a table each, in a file each.
+//
+// A new API has a row in FindOwnApi, a page in docs/api, and a place in the web server's list of APIs that are no log-in
+// (packaging/nginx).
 #pragma once
 
 #include <span>
@@ -37,7 +40,7 @@ extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it se
 extern const OwnApi kPlaybackApi;  // steers a running player of the caller's session
 extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
 
-// Null when the host serves no such API.
+// Null when there is no such API.
 const OwnApi* FindOwnApi(const std::string& name);
 
 }  // namespace lookhaven::api

@@ -115,7 +115,7 @@ void AddBody(const http::Request& request, Parameters& parameters) {
     const bool query_names_api = parameters.contains("api");
     for (auto& [name, value] : type == "application/json" ? ReadJson(request.body) : ReadForm(request.body)) {
         if (NamesMethod(name) && (query_names_api || parameters.contains(name))) {
-            throw http::Failure(400, "the parameter " + name + " belongs into the address, once");
+            throw http::Failure(400, "the parameter " + name + " belongs in the query string, once");
         }
         Add(name, value, parameters);
     }

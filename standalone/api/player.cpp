@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Why so        A player that takes its rate from the progress file does not tell its position, and the other way round; one
-//               that samples waits for no clock, so it has no rate. Only the player by times looks at the pause, and stands
-//               still then at rate 1 and slower alone: a faster one is slowed down first.
+// Why so        The progress file holds one number, so a player that reads its rate there cannot report its position there.
+//               A player with an interval is not paced and has no rate. Only PlayMjpegEventNoFrameId can pause, and only at
+//               rate 1 or slower; a faster one is first set to rate 1.
 #include "standalone/api/player.h"
 
 #include <algorithm>
@@ -18,9 +18,9 @@ constexpr const char* kByFrames = "PlayMjpegEvent";
 constexpr const char* kByTimes = "PlayMjpegEventNoFrameId";
 constexpr int kMaxSideBySide = 16;
 
-int IntOr(const Call& call, const char* name, int otherwise) {
+int IntOr(const Call& call, const char* name, int fallback) {
     const Json::Value& value = call.Parameter(name);
-    return value.isNull() ? otherwise : value.asInt();
+    return value.isNull() ? fallback : value.asInt();
 }
 
 }  // namespace

@@ -13,8 +13,8 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file_descriptor.h"
-#include "standalone/binding/rights.h"
 #include "standalone/binding/pair_token.h"
+#include "standalone/binding/rights.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::api {

@@ -89,7 +89,7 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
         throw Failure(405, "this method takes POST only");
     }
     if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {
-        throw Failure(403, "only those who administer the host may do this");
+        throw Failure(403, "only an administrator may do this");
     }
     try {
         return method.serve(call);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A small file that refers to a period of footage in recordings of one camera: the footage of an alert or a POS event.
+// A small file that refers to a period of footage in recordings of one camera: the footage of an alert or a POS transaction.
 //
 //   lookhaven span 1
 //   begin 1772352930000

@@ -36,8 +36,9 @@ void Log(Severity severity, std::string_view text) noexcept try {
     std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
                        kSeverityNames[static_cast<std::size_t>(severity)] + ": ";
     line += text.substr(0, text.find_last_not_of("\r\n") + 1);
+    // A line stays one line, and nothing in it steers the terminal that shows it.
     std::replace_if(
-        line.begin(), line.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
+        line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7f; }, ' ');
     line += '\n';
     // A log that cannot be written has nobody to tell.
     [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every room says of video and sound: media, codecs, why something is recorded, and how large and long it may be.
+// Terms shared by all parts: media, codecs, why something is recorded, and how large and long it may be.
 #pragma once
 
 #include <cstdint>
@@ -9,7 +9,7 @@
 
 namespace lookhaven::base {
 
-// The numbers stand in shared memory.
+// The numbers are stored in shared memory.
 enum class Medium : std::int32_t { kVideo = 0, kAudio = 1 };
 
 // The numbers of video codecs are stored, and go to clients; those of sound never leave the process.
@@ -25,11 +25,11 @@ const char* CodecName(Codec codec);
 // The reverse: exactly one of those spellings, else nothing.
 std::optional<Codec> CodecNamed(std::string_view name);
 
-// Why it was recorded. The numbers are stored, stand in files and go to clients.
+// Why it was recorded. The numbers are stored in rows and files, and go to clients.
 constexpr int kReasonContinuous = 1;
 constexpr int kReasonAlarm = 3;
 
-// The largest frame or sound block. Sources drop what is larger, readers take it for damage.
+// The largest frame or sound block. Sources drop what is larger, readers treat it as corruption.
 constexpr std::int32_t kMaxFrameBytes = 4'194'303;
 
 // No event, and so no recording, is longer; searches rely on it.

@@ -22,6 +22,7 @@ LH_PLATFORM_API std::string MakePairToken(std::string_view secret, std::string_v
 
 // Whether the token was made with the secret for the timestamp, and the timestamp is within the window around now. False
 // for anything malformed, an empty secret too. Takes the same time whatever byte of the token is wrong.
-LH_PLATFORM_API bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s);
+LH_PLATFORM_API bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret,
+                                      std::int64_t now_s);
 
 }  // namespace lookhaven::binding

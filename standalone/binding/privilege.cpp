@@ -94,7 +94,12 @@ std::set<int> DeniedCameras(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     std::set<int> denied = context.CamerasDeniedByRequest();
     if (context.Caller() != PAIR_AUTH_UID) {
-        denied.merge(store::Users(context.Records()).DeniedCameras(static_cast<int>(context.Caller()), kind));
+        store::Users users(context.Records());
+        const int id = static_cast<int>(context.Caller());
+        if (!users.Find(id)) {  // removed meanwhile: everything is denied, which no set can say
+            throw std::runtime_error("the caller's account was removed");
+        }
+        denied.merge(users.DeniedCameras(id, kind));
     }
     return denied;
 }
@@ -148,6 +153,7 @@ std::set<int> PrivProfile::GetInaCamIdSet(CAM_PRIV_TYPE type, bool) const {
 
 // Few requests ask for these, so they are read on demand; an exception of the store ends the request.
 std::set<int> PrivProfile::GetInaPrivPerCamGrpIdSet(int type) const {
+    RequireSomebody(m_pData->id);
     return IsUser(m_pData->id) ? Users().DeniedGroups(m_pData->id, static_cast<store::CameraAccess>(type))
                                : std::set<int>{};
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The state behind the request and response objects that the module is given; the host fills the one, reads the other.
+// The state behind the request and response objects that the module is given; api/ fills the one and reads the other.
 #pragma once
 
 #include <map>

@@ -23,7 +23,7 @@
 
 namespace lookhaven::binding {
 
-// What the host is told while the module works.
+// Called while the module works.
 struct RequestEvents {
     // Once, when it turns out that the answer is a stream: it has no deadline.
     std::function<void()> on_stream = [] {};

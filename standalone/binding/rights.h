@@ -15,7 +15,7 @@
 
 namespace lookhaven::binding {
 
-// The cameras that the rights, as a relaying host sends them along, deny: for every kind of access. Throws Json::Exception
+// The cameras denied by the rights that a paired host sends with the request, for every kind of access. Throws Json::Exception
 // for another shape than the one in privilege.cpp.
 LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
 

@@ -7,9 +7,9 @@
 #include "platform/camera/camera.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/base/clock.h"
+#include "standalone/binding/pair_token.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/binding/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 

@@ -185,8 +185,12 @@ Findings CheckRecordings(const base::Installation& installation) {
     for (const maintenance::RecordingStatus& state : maintenance::ReadRecordingStatus(installation)) {
         if (state.state != maintenance::RecordingState::kReady &&
             state.state != maintenance::RecordingState::kRecording) {
+            const bool lacks_event_id = state.state == maintenance::RecordingState::kNoEventId;
             findings.push_back({Concat("camera ", state.camera, " is not recorded: ", maintenance::NameOf(state.state)),
-                                "check its mount with lookhaven mount list; recording then resumes by itself"});
+                                lacks_event_id
+                                    ? "mend the store, which gives out event ids; recording then resumes by itself"
+                                    : "check that its mount is enabled and in its place with lookhaven mount "
+                                      "list; recording then resumes by itself"});
         }
     }
     return findings;

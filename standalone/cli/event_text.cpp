@@ -28,7 +28,9 @@ std::string SizeText(const Json::Value& size) {
 std::string StateText(const Json::Value& event) {
     std::string text;
     for (const char* state : {"recording", "archived", "demo"}) {
-        text += event[state].asBool() ? state : "";
+        if (event[state].asBool()) {
+            text += (text.empty() ? "" : " ") + std::string(state);
+        }
     }
     return text;
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recordings of the last days for a newcomer, with alerts and POS transactions, encoded faster than real time.
+// Recordings of the last days for a trial, with alerts and POS transactions, encoded faster than real time.
 #pragma once
 
 #include <cstdint>

@@ -6,7 +6,6 @@
 #include <string>
 
 #include <sys/prctl.h>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include "standalone/base/log.h"
@@ -22,9 +21,7 @@ void CloseFrom(int first) {
     if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
         return;
     }
-    rlimit limit{};
-    ::getrlimit(RLIMIT_NOFILE, &limit);
-    for (int descriptor = first; descriptor < static_cast<int>(limit.rlim_cur); ++descriptor) {
+    for (int descriptor = first; descriptor < static_cast<int>(::sysconf(_SC_OPEN_MAX)); ++descriptor) {
         ::close(descriptor);
     }
 }

@@ -66,7 +66,7 @@ Listener::Listener(const std::filesystem::path& path) {
     const sockaddr_un address = Address(path);
     const auto* generic = reinterpret_cast<const sockaddr*>(&address);
     if (::connect(NewSocket().Get(), generic, sizeof address) == 0 || errno == EAGAIN) {
-        throw std::runtime_error("another host serves " + path.string() + " already");
+        throw std::runtime_error("another lookhaven-webapi already listens on " + path.string());
     }
     ::unlink(path.c_str());
     socket_ = NewSocket();

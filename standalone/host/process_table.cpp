@@ -67,27 +67,27 @@ std::optional<ProcessTable::Started> ProcessTable::Start(base::FileDescriptor& c
 
 void ProcessTable::HangUp(pid_t pid) {
     if (const auto found = processes_.find(pid); found != processes_.end()) {
-        BeginLeaving(found->second);
+        BeginEnding(found->second);
     }
 }
 
-void ProcessTable::LeaveAll() {
+void ProcessTable::EndAll() {
     for (auto& [pid, process] : processes_) {
-        BeginLeaving(process);
+        BeginEnding(process);
     }
 }
 
-void ProcessTable::LeaveEnded() {
+void ProcessTable::EndMarked() {
     for (auto& [pid, process] : processes_) {
         if (process.slot->must_end) {
-            BeginLeaving(process);
+            BeginEnding(process);
         }
     }
 }
 
-void ProcessTable::BeginLeaving(Process& process) {
-    if (!process.leaves_since) {
-        process.leaves_since = process.next_signal = Clock::now();
+void ProcessTable::BeginEnding(Process& process) {
+    if (!process.ending_since) {
+        process.ending_since = process.next_signal = Clock::now();
         process.slot->must_end = true;
     }
 }
@@ -118,7 +118,7 @@ void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {
     }
 }
 
-bool ProcessTable::SignalSurplus() {
+bool ProcessTable::SignalExcess() {
     bool again = false;
     for (const std::string& session : slots_.SessionsWithPlayers()) {
         for (const control::Slot* slot : slots_.ExcessPlayers(session, control::ReadPlayerFile(session))) {
@@ -153,7 +153,7 @@ void ProcessTable::SignalPlayers(Clock::time_point now) {
     if (now < players_due_) {
         return;
     }
-    players_due_ = SignalSurplus() ? now + limits_.repeat : Clock::time_point::max();
+    players_due_ = SignalExcess() ? now + limits_.repeat : Clock::time_point::max();
     if (SignalPauses()) {
         players_due_ = now + kPendingSignal;
     }
@@ -164,19 +164,19 @@ Clock::time_point ProcessTable::SendDueSignals(Clock::time_point now) {
     Clock::time_point next = players_due_;
     for (auto& [pid, process] : processes_) {
         const Clock::time_point answer_due = process.began + limits_.answer;
-        if (!process.leaves_since && !process.slot->is_stream) {
+        if (!process.ending_since && !process.slot->is_stream) {
             if (now < answer_due) {
                 next = std::min(next, answer_due);
                 continue;
             }
             base::LogError("request process " + std::to_string(pid) + " has not answered in time");
-            BeginLeaving(process);
+            BeginEnding(process);
         }
-        if (!process.leaves_since) {
+        if (!process.ending_since) {
             continue;
         }
         if (now >= process.next_signal) {
-            Signal(process.pidfd, now - *process.leaves_since >= limits_.leave ? SIGKILL : SIGTERM);
+            Signal(process.pidfd, now - *process.ending_since >= limits_.leave ? SIGKILL : SIGTERM);
             process.next_signal = now + limits_.repeat;
         }
         next = std::min(next, process.next_signal);

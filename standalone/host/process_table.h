@@ -6,7 +6,7 @@
 //               to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
-//               (3) A player is asked to look at its player file only while that names another one of its session.
+//               (3) SIGUSR1 is sent to a player only while the player file names another process of its session.
 // Thread safety One thread.
 #pragma once
 
@@ -48,11 +48,11 @@ class ProcessTable {
     std::optional<Started> Start(base::FileDescriptor& connection, control::Slot& slot,
                                  const std::function<void()>& run);
 
-    // The process's client is gone: tells the process to leave.
+    // The process's client is gone: ends the process.
     void HangUp(pid_t pid);
-    void LeaveAll();
+    void EndAll();
     // Those whose session or player has ended.
-    void LeaveEnded();
+    void EndMarked();
     // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
     // The process has ended: sweeps what it left and frees its slot.
@@ -69,14 +69,14 @@ class ProcessTable {
         base::FileDescriptor pidfd;
         control::Slot* slot = nullptr;
         Clock::time_point began;
-        std::optional<Clock::time_point> leaves_since;
+        std::optional<Clock::time_point> ending_since;
         Clock::time_point next_signal;
     };
 
-    static void BeginLeaving(Process& process);
+    static void BeginEnding(Process& process);
     void Sweep(pid_t pid, const control::Slot& slot) const;
     void SignalPlayers(Clock::time_point now);
-    bool SignalSurplus();
+    bool SignalExcess();
     bool SignalPauses();
 
     ProcessLimits limits_;

@@ -97,11 +97,11 @@ void Server::Handle(Kind kind, std::uint32_t id) {
     case Kind::kWake:
         slots_.ClearWake();
         processes_.LookAtPlayers();
-        return processes_.LeaveEnded();
+        return processes_.EndMarked();
     case Kind::kWatcher:
         base::LogWarning("the session watcher has ended");
         EndWatcher();
-        watcher_due_ = Clock::now() + kWatcherRestart;
+        watcher_due_ = ending_ ? Clock::time_point::max() : Clock::now() + kWatcherRestart;
         return;
     case Kind::kConnection:
         return Read(static_cast<int>(id));
@@ -202,6 +202,7 @@ void Server::StartWatcher() {
     watcher_.Reset(watcher_pid_ < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, watcher_pid_, 0)));
     if (!watcher_) {
         base::LogError("cannot start the session watcher");
+        EndWatcher();
         watcher_due_ = Clock::now() + kWatcherRestart;
         return;
     }
@@ -221,9 +222,10 @@ void Server::BeginShutdown() {
     signalfd_siginfo signal{};
     [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
     ending_ = true;
+    watcher_due_ = accept_due_ = Clock::time_point::max();
     listener_.Reset();
     connections_.clear();
-    processes_.LeaveAll();
+    processes_.EndAll();
 }
 
 Clock::time_point Server::DoWhatIsDue() {

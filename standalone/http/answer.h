@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// JSON answers with their head lines, and the failures that the host itself reports.
+// JSON answers with their header lines, and the failures that the host itself reports.
 #pragma once
 
 #include <stdexcept>
@@ -18,7 +18,7 @@ class Failure : public std::runtime_error {
     int status_;
 };
 
-// The whole answer with a body of JSON. extra: further head lines, each ending in CR LF.
+// The whole answer with a body of JSON. extra: further header lines, each ending in CR LF.
 std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
 
 // {"success": false, "error": {"code": status, "data": null, "message": …}}

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Attaches the footage to alerts and POS events (marks) once it has been recorded.
+// Attaches the footage to alerts and POS transactions (marks) once it has been recorded.
 #pragma once
 
 #include <cstdint>

@@ -29,8 +29,22 @@ std::string MarkerText(int mount_id) {
     return "lookhaven mount " + std::to_string(mount_id) + "\n";
 }
 
+// Only these errors say that there is no such file; any other says nothing of what lies there.
+bool MeansAbsent(int error) {
+    return error == ENOENT || error == ENOTDIR;
+}
+
+// Empty when there is no such folder. Throws std::system_error when it cannot be told.
 base::FileDescriptor OpenFolderAt(int parent, const char* name) {
-    return base::FileDescriptor(::openat(parent, name, kFolderFlags));
+    base::FileDescriptor folder(::openat(parent, name, kFolderFlags));
+    if (!folder && !MeansAbsent(errno)) {
+        base::ThrowErrno(std::string("cannot open the folder of recordings ") + name);
+    }
+    return folder;
+}
+
+bool IsCameraFolder(const std::string& name) {
+    return !name.empty() && name.find_first_not_of("0123456789") == name.npos;
 }
 
 // The names in the folder, without "." and "..".
@@ -116,8 +130,16 @@ base::FileDescriptor MountFolder::OpenDay(int camera, std::int64_t second) const
 bool MountFolder::Has(const archive::FileName& name) const {
     const base::FileDescriptor day = OpenDay(name.camera, name.start_s);
     struct stat status {};
-    return day && ::fstatat(day.Get(), FileNameOf(name).c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
-           S_ISREG(status.st_mode);
+    if (!day) {
+        return false;
+    }
+    if (::fstatat(day.Get(), FileNameOf(name).c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
+        if (!MeansAbsent(errno)) {
+            base::ThrowErrno("cannot look for " + (path_ / archive::PathOf(name)).string());
+        }
+        return false;
+    }
+    return S_ISREG(status.st_mode);
 }
 
 bool MountFolder::Remove(const archive::FileName& name) const {
@@ -172,7 +194,8 @@ std::vector<MountFolder::File> MountFolder::Files(std::int64_t from_s) const {
     std::vector<File> files;
     const std::string first_day = archive::DayOf(from_s);
     for (const std::string& camera : NamesIn(folder_.Get())) {
-        const base::FileDescriptor folder = OpenFolderAt(folder_.Get(), camera.c_str());
+        const base::FileDescriptor folder =
+            IsCameraFolder(camera) ? OpenFolderAt(folder_.Get(), camera.c_str()) : base::FileDescriptor();
         for (const std::string& day : folder ? NamesIn(folder.Get()) : std::vector<std::string>()) {
             const base::FileDescriptor day_folder =
                 day >= first_day ? OpenFolderAt(folder.Get(), day.c_str()) : base::FileDescriptor();

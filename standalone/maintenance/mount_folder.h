@@ -44,7 +44,7 @@ class MountFolder {
 
     // Whether anything of the camera was recorded on that UTC day.
     bool HasDay(int camera, std::int64_t second) const { return static_cast<bool>(OpenDay(camera, second)); }
-    // Whether it exists, as a regular file.
+    // Whether it exists, as a regular file. Throws std::system_error when that cannot be told.
     bool Has(const archive::FileName& name) const;
     // Removes the file, and a recording's index with it. False when neither existed. Throws std::system_error when the
     // file cannot be removed; it is still there then. An index that cannot be removed stays behind, and verify finds

@@ -1,13 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/maintenance/recovery.h"
 
-#include <map>
-#include <set>
+#include <optional>
 #include <string>
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/salvage.h"
-#include "standalone/store/mounts.h"
 
 namespace lookhaven::maintenance {
 
@@ -40,32 +38,19 @@ void AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, 
 
 }  // namespace
 
-void Recover(store::Store& store, int first_own_id, std::int64_t now_s) {
+bool Recover(store::Store& store, const store::Mount& mount, int first_own_id, std::int64_t now_s) {
+    const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
+    if (!folder) {
+        return false;
+    }
     store::Events events(store);
-    std::map<int, MountFolder> mounts;
-    for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id)) {
-            mounts.emplace(mount.id, std::move(*folder));
-        }
-    }
-    std::set<int> unmounted;
     for (const store::Event& row : events.Open()) {
-        const auto mount = mounts.find(row.mount_id);
-        if (row.id >= first_own_id || row.demo) {
-            continue;
+        if (row.mount_id == mount.id && row.id < first_own_id && !row.demo) {
+            LogOutcome([&] { return CloseEvent(events, *folder, row); });
         }
-        if (mount == mounts.end()) {
-            unmounted.insert(row.mount_id);
-            continue;
-        }
-        LogOutcome([&] { return CloseEvent(events, mount->second, row); });
     }
-    for (const int id : unmounted) {
-        base::LogWarning("mount " + std::to_string(id) + " is not mounted; its open events are closed once it is");
-    }
-    for (const auto& [id, mount] : mounts) {
-        AdoptRecent(events, mount, id, first_own_id, now_s);
-    }
+    AdoptRecent(events, *folder, mount.id, first_own_id, now_s);
+    return true;
 }
 
 }  // namespace lookhaven::maintenance

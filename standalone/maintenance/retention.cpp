@@ -59,7 +59,7 @@ class Retention {
         return excess;
     }
 
-    // How long an event is kept is decided here and nowhere else.
+    // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a mount.
     bool IsExpired(const store::Event& event) const {
         return mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s;
     }
@@ -84,7 +84,8 @@ class Retention {
     void RemoveFileOrRestoreRow(const store::Event& event, const archive::FileName& name) {
         try {
             folder_.Remove(name);
-        } catch (const std::system_error&) {
+        } catch (const std::system_error& failure) {
+            base::LogWarning("event " + std::to_string(event.id) + " keeps its row: " + failure.what());
             events_.Begin(event);
             throw;
         }
@@ -104,9 +105,13 @@ class Retention {
             if (HasFootage(event.camera_id, mark.start_s, mark.end_s)) {
                 continue;
             }
-            if (RemoveSpan(mark)) {
-                marks_.Remove(mark.id);
-                ++deleted_.marks;
+            try {
+                if (RemoveSpan(mark)) {
+                    marks_.Remove(mark.id);
+                    ++deleted_.marks;
+                }
+            } catch (const std::system_error& failure) {  // its file may lie on another mount
+                base::LogWarning("mark " + std::to_string(mark.id) + " stays: " + failure.what());
             }
         }
     }

@@ -38,9 +38,9 @@ constexpr std::array<Colour, 8> kBars{{{190, 190, 190},
                                        {18, 18, 22}}};
 
 // A random generator with the same numbers on every platform, unlike the distributions of the standard library.
-class Dice {
+class Random {
   public:
-    explicit Dice(std::uint32_t seed) : state_(seed | 1) {}
+    explicit Random(std::uint32_t seed) : state_(seed | 1) {}
     // 0 … 1
     double Roll() {
         state_ ^= state_ << 13;
@@ -71,7 +71,7 @@ class Canvas {
     Colour& At(int x, int y) {
         return pixels_[static_cast<std::size_t>(y) * static_cast<std::size_t>(width_) + static_cast<std::size_t>(x)];
     }
-    Picture ToPicture(Dice& dice);
+    Picture ToPicture(Random& random);
 
   private:
     int width_;
@@ -80,7 +80,7 @@ class Canvas {
 };
 
 // Noise below one step of luma prevents banding in smooth skies.
-Picture Canvas::ToPicture(Dice& dice) {
+Picture Canvas::ToPicture(Random& random) {
     Picture picture;
     for (std::size_t p = 0; p < picture.size(); ++p) {
         const int shrink = p == 0 ? 1 : 2;
@@ -91,14 +91,14 @@ Picture Canvas::ToPicture(Dice& dice) {
                 const double value = p == 0   ? 0.299 * c.red + 0.587 * c.green + 0.114 * c.blue
                                      : p == 1 ? 128 - 0.168736 * c.red - 0.331264 * c.green + 0.5 * c.blue
                                               : 128 + 0.5 * c.red - 0.418688 * c.green - 0.081312 * c.blue;
-                picture[p].pixels.push_back(static_cast<std::uint8_t>(std::clamp(value + dice.Roll(), 0.0, 255.0)));
+                picture[p].pixels.push_back(static_cast<std::uint8_t>(std::clamp(value + random.Roll(), 0.0, 255.0)));
             }
         }
     }
     return picture;
 }
 
-void DrawSky(Canvas& canvas, const Palette& palette, int width, int height, int unit_px, Dice& dice) {
+void DrawSky(Canvas& canvas, const Palette& palette, int width, int height, int unit_px, Random& random) {
     for (int y = 0; y < height; ++y) {
         const double down = std::min(1.0, y / (0.72 * height));
         const Colour colour = down < 0.6 ? Mix(palette.zenith, palette.sky, down / 0.6)
@@ -109,9 +109,9 @@ void DrawSky(Canvas& canvas, const Palette& palette, int width, int height, int 
     }
     const int star_px = std::max(1, unit_px / 5);
     for (int star = 0; star < 90; ++star) {
-        const int x = static_cast<int>(dice.Roll() * (width - star_px));
-        const int y = static_cast<int>(dice.Roll() * dice.Roll() * 0.5 * height);
-        const double brightness = 0.12 + 0.5 * dice.Roll() * dice.Roll();
+        const int x = static_cast<int>(random.Roll() * (width - star_px));
+        const int y = static_cast<int>(random.Roll() * random.Roll() * 0.5 * height);
+        const double brightness = 0.12 + 0.5 * random.Roll() * random.Roll();
         for (int i = 0; i < star_px * star_px; ++i) {
             Colour& pixel = canvas.At(x + i % star_px, y + i / star_px);
             pixel = Mix(pixel, {255, 250, 240}, brightness);
@@ -120,13 +120,13 @@ void DrawSky(Canvas& canvas, const Palette& palette, int width, int height, int 
 }
 
 // Four ranges of hills, the distant ones pale with haze.
-std::vector<int> DrawHills(Canvas& canvas, const Palette& palette, int width, int height, Dice& dice) {
+std::vector<int> DrawHills(Canvas& canvas, const Palette& palette, int width, int height, Random& random) {
     std::vector<int> ridge(static_cast<std::size_t>(width), height);
     for (const double near : {0.0, 0.33, 0.66, 1.0}) {
         const Colour crest = Mix(Mix(palette.horizon, palette.sky, 0.55), palette.ground, 0.25 + 0.75 * near);
         const Colour foot = Mix(crest, palette.horizon, 0.22 * (1 - near));
         std::array<double, 4> phase{};
-        std::generate(phase.begin(), phase.end(), [&] { return dice.Roll() * 6.283; });
+        std::generate(phase.begin(), phase.end(), [&] { return random.Roll() * 6.283; });
         for (int x = 0; x < width; ++x) {
             double swell = 0;
             for (std::size_t wave = 0; wave < phase.size(); ++wave) {
@@ -157,12 +157,12 @@ void DrawBars(Canvas& canvas, int width, int height, int bar_height_px) {
 Landscape DrawLandscape(int width, int height, int unit_px, std::string_view seed) {
     const std::uint32_t hash = Hash(seed);
     const Palette& palette = kPalettes[hash >> 30];
-    Dice dice(hash);
+    Random random(hash);
     Canvas canvas(width, height);
-    DrawSky(canvas, palette, width, height, unit_px, dice);
-    std::vector<int> ridge = DrawHills(canvas, palette, width, height, dice);
+    DrawSky(canvas, palette, width, height, unit_px, random);
+    std::vector<int> ridge = DrawHills(canvas, palette, width, height, random);
     DrawBars(canvas, width, height, 2 * unit_px);
-    return {canvas.ToPicture(dice), std::move(ridge)};
+    return {canvas.ToPicture(random), std::move(ridge)};
 }
 
 }  // namespace lookhaven::pattern

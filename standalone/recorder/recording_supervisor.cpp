@@ -141,9 +141,7 @@ bool RecordingSupervisor::HasEnded() {
 void RecordingSupervisor::Maintain(store::Store& store) {
     const std::int64_t now_s = base::WallMillis() / 1000;
     MarkNewMounts(store);
-    if (const std::optional<int> first = rows_.FirstOwnId(); first && !std::exchange(recovered_, true)) {
-        maintenance::Recover(store, *first, now_s);
-    }
+    RecoverMounts(store, now_s);
     maintenance::CompleteMarks(store, now_s);
     const std::int64_t now_us = base::MonotonicMicros();
     if (!needs_space_.exchange(false) && now_us < next_retention_us_) {
@@ -151,6 +149,23 @@ void RecordingSupervisor::Maintain(store::Store& store) {
     }
     next_retention_us_ = now_us + kRetentionUs;
     DeleteOld(store, now_s);
+}
+
+// Each mount once, as soon as it is mounted; what failed is tried again.
+void RecordingSupervisor::RecoverMounts(store::Store& store, std::int64_t now_s) {
+    const std::optional<int> first = rows_.FirstOwnId();
+    if (!first) {
+        return;
+    }
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        if (!recovered_mounts_.contains(mount.id)) {
+            TryOn(mount, "recover the events of", [&] {
+                if (maintenance::Recover(store, mount, *first, now_s)) {
+                    recovered_mounts_.insert(mount.id);
+                }
+            });
+        }
+    }
 }
 
 // A mount without any events gets its marker file; one that has events but no marker is an unplugged disk.

@@ -43,6 +43,7 @@ class RecordingSupervisor {
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
     void AnswerFlushes();
     void Maintain(store::Store& store);
+    void RecoverMounts(store::Store& store, std::int64_t now_s);
     void MarkNewMounts(store::Store& store);
     void DeleteOld(store::Store& store, std::int64_t now_s);
     template <class Work>
@@ -53,7 +54,7 @@ class RecordingSupervisor {
     control::FlushRequests flush_requests_;
     EventRowQueue rows_;
     std::atomic<bool> needs_space_ = true;
-    bool recovered_ = false;                                // only the maintenance thread uses it
+    std::set<int> recovered_mounts_;                        // only the maintenance thread uses it
     std::int64_t next_retention_us_ = 0;                    // likewise
     std::map<std::string, std::string> reported_failures_;  // likewise; by purpose
     StoreThread maintenance_;

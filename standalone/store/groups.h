@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Camera groups. What is denied of a group to a user stands in users.h.
+// Camera groups. What is denied of a group to a user see users.h.
 #pragma once
 
 #include <optional>

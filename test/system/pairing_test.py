@@ -4,12 +4,62 @@
 import base64
 import hashlib
 import hmac
+import http.server
 import json
+import pathlib
+import ssl
+import subprocess
+import tempfile
+import threading
 import time
 import unittest
 
 from api_test import call, play
 from installation import Installation, Parts, wait_until
+
+
+class HostileHost:
+    """A paired host whose every answer tries to steer the web server and the browser of the host that asks it."""
+
+    HEADERS = {
+        "Content-Type": "text/html",
+        "Set-Cookie": "id=chosen-by-another; Path=/",
+        "X-Accel-Redirect": "/webapi?api=VEXO.Auth&version=1&method=Status",
+        "Clear-Site-Data": "*",
+        "Access-Control-Allow-Origin": "*",
+        "Refresh": "0; url=https://evil.example/",
+    }
+
+    class Handler(http.server.BaseHTTPRequestHandler):
+        def do_GET(self):
+            self.send_response(200)
+            for name, value in HostileHost.HEADERS.items():
+                self.send_header(name, value)
+            self.end_headers()
+            self.wfile.write(b"<script>evil()</script>")
+
+        def log_message(self, *arguments):
+            pass
+
+    def __enter__(self):
+        self.folder = tempfile.TemporaryDirectory()
+        key, certificate = (pathlib.Path(self.folder.name) / name for name in ("key.pem", "certificate.pem"))
+        subprocess.run(
+            ["openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:prime256v1", "-nodes", "-days", "2",
+             "-subj", "/CN=hostile", "-keyout", key, "-out", certificate], check=True, capture_output=True
+        )
+        self.certificate = certificate.read_text()
+        context = ssl.SSLContext(ssl.PROTOCOL_TLS_SERVER)
+        context.load_cert_chain(certificate, key)
+        self.server = http.server.ThreadingHTTPServer(("127.0.0.1", 0), self.Handler)
+        self.server.socket = context.wrap_socket(self.server.socket, server_side=True)
+        threading.Thread(target=self.server.serve_forever, daemon=True).start()
+        return self
+
+    def __exit__(self, *error):
+        self.server.shutdown()
+        self.server.server_close()
+        self.folder.cleanup()
 
 
 class PairingTest(unittest.TestCase):
@@ -124,6 +174,20 @@ class PairingTest(unittest.TestCase):
         self.assertEqual(self.watcher.request(query, "admin").status, 502)
         self.watcher.cli("server", "remove", "2")
         self.assertEqual(self.watcher.request(query, "admin").status, 404)
+
+    def test_a_hostile_host_steers_neither_web_server_nor_browser(self):
+        hostile = self.enterContext(HostileHost())
+        line = self.owner.cli("server", "pair", "Third", "--address", "127.0.0.1", "--port", str(hostile.server.server_port))
+        prefix, coded = line.strip().split(":", 1)
+        said = {**json.loads(base64.b64decode(coded)), "certificate": hostile.certificate}
+        line = f"{prefix}:{base64.b64encode(json.dumps(said).encode()).decode()}"
+        server = json.loads(self.watcher.cli("server", "add", "Hostile", "--json", text=line))["id"]
+        query = call("VEXO.Relay", "Play", server=server, camera=1, snapshot=1)
+        answer = wait_until(lambda: (a := self.watcher.request(query, "admin")).status == 200 and a, 10, "the hostile answer")
+        self.assertEqual(answer.body, b"<script>evil()</script>", "it came from the other host, not from a redirect here")
+        self.assertEqual(answer.headers["Content-Security-Policy"], "default-src 'none'; sandbox")
+        for name in set(HostileHost.HEADERS) - {"Content-Type"}:
+            self.assertIsNone(answer.headers[name], name)
 
 
 if __name__ == "__main__":

@@ -13,7 +13,7 @@ export interface Unplayable {
 
 const kUsualTlsPort = "8443";
 
-/** The same page over HTTPS, at the port that the page itself names. */
+/** The same page over HTTPS, at the port that the web server put into the page. */
 export function secureAddress(page: Location = location): string {
   const port = document.querySelector<HTMLMetaElement>("meta[name=tls-port]")?.content || kUsualTlsPort;
   return `https://${page.hostname}${port === "443" ? "" : `:${port}`}${page.pathname}${page.hash}`;
