@@ -97,7 +97,10 @@ std::optional<Account> FetchByName(Connection& connection, std::string_view name
 User Users::Add(std::string_view name, std::string_view password, Privilege privilege) {
     RequireName(name);
     RequirePassword(password);
-    VerifiedUser user{{0, std::string(name), privilege}, HashPassword(password)};
+    VerifiedUser user;
+    user.name = name;
+    user.privilege = privilege;
+    user.password_hash = HashPassword(password);
     return connection_.Write([&](soci::session& sql) -> User {
         user.id = NextId(sql, "user");
         if (Exists(sql, "select id from users where lower(name) = lower(:name)", user.name)) {

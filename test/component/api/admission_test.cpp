@@ -5,6 +5,10 @@
 
 #include <gtest/gtest.h>
 
+#include "standalone/base/clock.h"
+#include "standalone/store/connection.h"
+#include "standalone/store/sessions.h"
+#include "standalone/store/users.h"
 #include "test/support/host/host_under_test.h"
 
 namespace lookhaven::api {
@@ -46,6 +50,16 @@ TEST_F(Admission, OnlyASessionMayCostMuch) {
     EXPECT_EQ(Status(success, false, large), 401);
     EXPECT_EQ(Status("api=VEXO.Auth&version=1&method=Login", false, large), 413);
     EXPECT_EQ(Status(success, true, "p=" + large.substr(2)), 200);
+}
+
+TEST_F(Admission, AStoreThatCannotBeWrittenStillServesWhoIsLoggedIn) {
+    store::Store records = store::Store::Open(host_.Home().StoreUrl());
+    const auto user = store::Users(records).CheckPassword("admin", "right password");
+    const std::string idle = store::Sessions(records).Create(*user, base::WallMillis() / 1000 - 300).secret;
+    // Other writers wait for this transaction in vain.
+    const int status = records.connection().Write(
+        [&](soci::session&) { return host_.Ask("api=Test&version=1&method=Success", idle).status; });
+    EXPECT_EQ(status, 200);
 }
 
 TEST_F(Admission, AnIpv6NetworkCountsAsOneAddress) {

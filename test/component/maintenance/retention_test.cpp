@@ -10,6 +10,8 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <unistd.h>
 
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
@@ -132,6 +134,34 @@ TEST_F(RetentionTest, AnEventWhoseFileCannotBeRemovedKeepsItsRow) {
     EXPECT_EQ(footage_.FileOf(stuck), file);
     fs::remove(file);
     EXPECT_EQ(Run(1).events, 2);
+}
+
+// Leaves this process so many further descriptors.
+class FewDescriptors {
+  public:
+    explicit FewDescriptors(int further) {
+        const int next = ::dup(STDIN_FILENO);
+        ::close(next);
+        ::getrlimit(RLIMIT_NOFILE, &before_);
+        rlimit few = before_;
+        few.rlim_cur = static_cast<rlim_t>(next + further);
+        ::setrlimit(RLIMIT_NOFILE, &few);
+    }
+    ~FewDescriptors() { ::setrlimit(RLIMIT_NOFILE, &before_); }
+
+  private:
+    rlimit before_{};
+};
+
+TEST_F(RetentionTest, AFolderThatCannotBeOpenedIsNotAnAbsentOne) {
+    const int event = footage_.Record(1, kNoon, 60);
+    {
+        const FewDescriptors mount_and_camera(2);
+        EXPECT_THROW(Run(0, 1), std::system_error) << "the day's folder takes a third";
+    }
+    EXPECT_THAT(Left(), ElementsAre(event));
+    EXPECT_TRUE(fs::exists(footage_.FileOf(event)));
+    EXPECT_EQ(Run(0, 1).events, 1);
 }
 
 TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
