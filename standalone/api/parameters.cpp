@@ -53,7 +53,7 @@ bool NamesMethod(const std::string& name) {
     return name == "api" || name == "version" || name == "method";
 }
 
-void Add(std::string name, Json::Value value, Parameters& parameters) {
+void Add(const std::string& name, Json::Value value, Parameters& parameters) {
     const bool is_new = parameters.insert_or_assign(name, std::move(value)).second;
     if (!is_new && NamesMethod(name)) {
         throw http::Failure(400, "the parameter " + name + " is named twice");

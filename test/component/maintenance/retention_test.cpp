@@ -10,7 +10,6 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
@@ -136,29 +135,25 @@ TEST_F(RetentionTest, AnEventWhoseFileCannotBeRemovedKeepsItsRow) {
     EXPECT_EQ(Run(1).events, 2);
 }
 
-// Leaves this process so many further descriptors.
-class FewDescriptors {
+// Root may pass every permission: takes that away until destruction.
+class OrdinaryUser {
   public:
-    explicit FewDescriptors(int further) {
-        const int next = ::dup(STDIN_FILENO);
-        ::close(next);
-        ::getrlimit(RLIMIT_NOFILE, &before_);
-        rlimit few = before_;
-        few.rlim_cur = static_cast<rlim_t>(next + further);
-        ::setrlimit(RLIMIT_NOFILE, &few);
-    }
-    ~FewDescriptors() { ::setrlimit(RLIMIT_NOFILE, &before_); }
-
-  private:
-    rlimit before_{};
+    OrdinaryUser() { EXPECT_TRUE(::geteuid() != 0 || ::seteuid(65534) == 0); }
+    ~OrdinaryUser() { EXPECT_EQ(::seteuid(::getuid()), 0); }
 };
 
 TEST_F(RetentionTest, AFolderThatCannotBeOpenedIsNotAnAbsentOne) {
     const int event = footage_.Record(1, kNoon, 60);
-    {
-        const FewDescriptors mount_and_camera(2);
-        EXPECT_THROW(Run(0, 1), std::system_error) << "the day's folder takes a third";
+    const fs::path camera = footage_.Mount() / "1";
+    for (const fs::path& folder : {fs::path(folder_), footage_.Mount()}) {
+        fs::permissions(folder, fs::perms(0755));
     }
+    fs::permissions(camera, fs::perms::none);
+    {
+        const OrdinaryUser user;
+        EXPECT_THROW(Run(0, 1), std::system_error);
+    }
+    fs::permissions(camera, fs::perms(0755));
     EXPECT_THAT(Left(), ElementsAre(event));
     EXPECT_TRUE(fs::exists(footage_.FileOf(event)));
     EXPECT_EQ(Run(0, 1).events, 1);
