@@ -43,7 +43,8 @@ Json::Value ToData(const RecordingServer& server) {
 
 // A host without an address only connects to this one.
 std::string AddressText(const Json::Value& address) {
-    return address == "" ? "incoming only" : address.asString();
+    const std::string text = address.asString();
+    return text.empty() ? "incoming only" : text;
 }
 
 constexpr Column kColumns[] = {
