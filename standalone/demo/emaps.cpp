@@ -37,7 +37,7 @@ Ids AddDevices(store::Store& store, const std::map<std::string, int>& cameras) {
     ids.io = devices.Add({.kind = EmapItemType::kIoModule,
                           .name = "Plant room",
                           .ports = {{0, {PortType::kInput, cameras.at("Parking")}}, {1, {PortType::kOutput, 0}}}});
-    ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = "Till", .camera_id = cameras.at("Entrance")});
+    ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = "POS terminal", .camera_id = cameras.at("Entrance")});
     devices.SetCameraPorts(cameras.at("Entrance"), {1, 1});
     const std::int64_t now_s = base::WallMillis() / 1000;
     devices.Report({EmapItemType::kDoor, ids.front_door, -1, "closed", now_s});
@@ -58,7 +58,7 @@ std::vector<EmapItem> GroundFloor(const Ids& ids, const std::map<std::string, in
             item(EmapItemType::kDoor, ids.back_door, "Loading door", 740, 160),
             item(EmapItemType::kIoModule, ids.io, "Smoke alarm", 190, 190, 0, 0),
             item(EmapItemType::kIoModule, ids.io, "Ventilation", 280, 190, 0, 1),
-            item(EmapItemType::kPos, ids.pos, "Till", 540, 430),
+            item(EmapItemType::kPos, ids.pos, "POS terminal", 540, 430),
             item(EmapItemType::kEmap, ids.upper, "Upper floor", 220, 590)};
 }
 

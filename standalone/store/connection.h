@@ -46,6 +46,8 @@ class Connection {
             return ask(session_);
         } catch (const soci::soci_error& error) {
             throw StoreError("the record store failed: " + error.get_error_message());
+        } catch (const std::bad_optional_access&) {
+            throw StoreError("the record store is damaged: a row that is always there is missing");
         }
     }
 

@@ -54,8 +54,8 @@ bool IsSource(std::string_view source) {
         return false;
     }
     const std::string_view rest = source.substr(colon + 1);
-    if (!rest.starts_with("//")) {  // a file's path or a test pattern: no place for an account
-        return !rest.empty() && (source.starts_with("file:") || rest.find('@') == rest.npos);
+    if (!rest.starts_with("//")) {
+        return !rest.empty() && rest.substr(0, rest.find_first_of("/?")).find('@') == rest.npos;
     }
     const std::string_view host = rest.substr(2, rest.find_first_of("/?#", 2) - 2);
     // Without a host it is a file's path, which may hold spaces.

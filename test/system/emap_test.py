@@ -125,16 +125,16 @@ class EmapTest(unittest.TestCase):
             self.assertEqual(seen["saved"], seen["dragged"])
             self.assertTrue(seen["dragged"][0] > seen["before"][0] and seen["dragged"][1] < seen["before"][1], seen)
             items = self.ask("Items", emap=1).json["data"]
-            till = next(item for item in items["items"] if item["name"] == "Till")
-            self.assertEqual([till["x"], till["y"]], seen["saved"])
-            self.assertEqual(self.save(emap=1, revision=items["revision"], items=[till]).status, 200)
+            terminal = next(item for item in items["items"] if item["name"] == "POS terminal")
+            self.assertEqual([terminal["x"], terminal["y"]], seen["saved"])
+            self.assertEqual(self.save(emap=1, revision=items["revision"], items=[terminal]).status, 200)
             visit.go_on()
 
             seen = visit.next()
             self.assertEqual(seen["step"], "saved over")
             items = self.ask("Items", emap=1).json["data"]["items"]
             self.assertEqual(len(items), 9, "the visitor's items are on top of the others'")
-            self.assertEqual([till["x"] + 1, till["y"]], seen["saved"])
+            self.assertEqual([terminal["x"] + 1, terminal["y"]], seen["saved"])
             visit.go_on()
 
             seen = visit.next()

@@ -38,20 +38,20 @@ await visit(async (page, complaints) => {
   await item(page, "Warehouse").waitFor();
   await report("link", { hash: new URL(page.url()).hash });
   await page.goBack();
-  await item(page, "Till").waitFor();
+  await item(page, "POS terminal").waitFor();
 
   await page.getByRole("button", { name: "Edit the map" }).click();
-  const till = page.locator(".map-editor .map-item").filter({ hasText: "Till" });
-  const before = await place(till);
-  await drag(page, till, 60, -30);
-  const dragged = await place(till);
+  const terminal = page.locator(".map-editor .map-item").filter({ hasText: "POS terminal" });
+  const before = await place(terminal);
+  await drag(page, terminal, 60, -30);
+  const dragged = await place(terminal);
   await page.keyboard.press("Control+z");
-  const undone = await place(till);
+  const undone = await place(terminal);
   await page.keyboard.press("Control+y");
   await page.keyboard.press("Control+s");
   await page.getByText("The map is saved.").waitFor();
   await page.screenshot({ path: `${folder}/editor.png` });
-  await report("moved", { before, dragged, undone, saved: await place(till) });
+  await report("moved", { before, dragged, undone, saved: await place(terminal) });
 
   // Meanwhile someone else has changed the map.
   await page.keyboard.press("ArrowRight");
@@ -59,7 +59,7 @@ await visit(async (page, complaints) => {
   await page.getByRole("alert").filter({ hasText: "Someone else" }).waitFor();
   await page.getByRole("button", { name: "Overwrite with mine" }).click();
   await page.getByRole("alert").filter({ hasText: "Someone else" }).waitFor({ state: "hidden" });
-  await report("saved over", { saved: await place(till) });
+  await report("saved over", { saved: await place(terminal) });
   await page.getByRole("button", { name: "Done" }).click();
 
   await page.getByRole("combobox", { name: "Map" }).selectOption({ label: "Harmful" });
