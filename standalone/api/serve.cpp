@@ -104,7 +104,9 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
 
 std::string Serve(const Service& service, const http::Request& request, control::SlotTable& slots,
                   control::Slot& slot) {
-    CheckOrigin(request);
+    if (const std::string_view method = request.Header("REQUEST_METHOD"); method != "GET" && method != "POST") {
+        throw Failure(405, "GET and POST only");
+    }
     Call call = ReadCall(request, slots, slot);
     const OwnApi* own = FindOwnApi(call.api);
     const EntryFunction entry = own == nullptr ? service.modules.Find(call.api, call.version, call.method) : nullptr;

@@ -82,6 +82,11 @@ TEST_F(Admission, OtherSitesMayNotAsk) {
         EXPECT_EQ(Status(success, true, body, {{"HTTP_SEC_FETCH_SITE", "same-site"}}), 403) << body;
         EXPECT_EQ(Status(success, true, body, {{"HTTP_SEC_FETCH_SITE", "none"}}), 200) << body;
     }
+    // The page of a paired host may, with its token; the caller's session does not count then.
+    const std::string live = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Nothing";
+    EXPECT_EQ(Status(live, true), 502) << "a session";
+    EXPECT_EQ(Status(live, true, "", {{"HTTP_SEC_FETCH_SITE", "cross-site"}}), 401) << "no session";
+    EXPECT_EQ(Status(live, true, "p=1", {{"HTTP_SEC_FETCH_SITE", "cross-site"}}), 403);
 }
 
 TEST_F(Admission, RestrictionsThatAreNotUnderstoodAreRefused) {
