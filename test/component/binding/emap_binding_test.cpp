@@ -139,7 +139,8 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
         GetPairedCam(own, row.port, camera, server, there);
         EXPECT_EQ(std::vector({camera, server, there}), std::vector({row.camera, row.server, row.there})) << row.port;
     }
-    devices_.Add({.kind = EmapItemType::kPos, .name = "POS terminal", .server_id = 1, .id_on_server = 5, .camera_id = 2});
+    devices_.Add(
+        {.kind = EmapItemType::kPos, .name = "POS terminal", .server_id = 1, .id_on_server = 5, .camera_id = 2});
     POS pos;
     ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 1) << "the camera's id on the till's server";
