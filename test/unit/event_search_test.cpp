@@ -19,28 +19,19 @@ namespace {
 constexpr int kDay = 86400;
 
 // A search of cameras 2 and 4 by a user who may not access cameras 9 and 12 nor group 6.
-struct Search {
-    explicit Search(const char* method) {
-        platform.method = method;
-        platform.log_cfg.m_CategLevel[68] = 1;
-        platform.denied_cameras = {12, 9};
-        platform.denied_groups = {6};
+struct Search : ScriptedPlatform {
+    explicit Search(const char* searched) {
+        method = searched;
+        log_cfg.m_CategLevel[68] = 1;
+        denied_cameras = {12, 9};
+        denied_groups = {6};
         for (const int id : {2, 4}) {
-            platform.mount_cameras[id] = MakeCamera(id, CAM_VIDEO_H265);
+            mount_cameras[id] = MakeCamera(id, CAM_VIDEO_H265);
         }
-        platform.group_cameras[12] = MakeCamera(12, CAM_VIDEO_MJPEG);
-        platform.params = {{"start", 1000000}, {"from", 1000000}, {"to", 1000060}, {"cameralists", "2"}};
+        group_cameras[12] = MakeCamera(12, CAM_VIDEO_MJPEG);
+        params = {{"start", 1000000}, {"from", 1000000}, {"to", 1000060}, {"cameralists", "2"}};
     }
-    void Run() { MultiPlayerHandler(platform.Request(), platform.Response()).HandleProcess(); }
-    // The calls that begin with the text.
-    Calls All(const std::string& text) const {
-        Calls found;
-        std::copy_if(platform.calls.begin(), platform.calls.end(), std::back_inserter(found),
-                     [&](const auto& call) { return call.rfind(text, 0) == 0; });
-        return found;
-    }
-
-    ScriptedPlatform platform;
+    void Run() { MultiPlayerHandler(Request(), Response()).HandleProcess(); }
 };
 
 const Calls kProfile = {"GetLoginUID()", "PrivProfileGetByUid(7)"};
@@ -48,9 +39,9 @@ const Calls kMount = {"GetInaPrivPerCamGrpIdSet(2)", "GetCamMountMap(3,9,12,1)"}
 
 TEST(SearchAvaiDate, AsksInOrder) {
     Search search("SearchAvaiDate");
-    search.platform.params["mount_id"] = 3;
+    search.params["mount_id"] = 3;
     search.Run();
-    EXPECT_EQ(search.platform.calls,
+    EXPECT_EQ(search.calls,
               (Calls({"GetAPIMethod()", "GetParam(mount_id,0)", "GetParam(day_count,1)", "GetParam(start,0)",
                       "GetParam(camGrpId,0)"}) +
                kProfile + Calls{"GetInaCamIdSet(2,1)"} + kMount +
@@ -60,72 +51,50 @@ TEST(SearchAvaiDate, AsksInOrder) {
 
 struct DaysRow {
     const char* name;
-    Json::Value start;
-    int day_count;
+    int start, day_count;
+    const char* query;                       // its span
     std::vector<std::pair<int, int>> spans;  // of events
-    const char* days;                        // "null" or a digit for each
+    std::string days;                        // a digit for each
 };
 
 const DaysRow kDays[] = {
-    {"first and last second of a day", 0, 4, {{kDay, 2 * kDay - 1}}, "0100"},
-    {"across midnight", 0, 4, {{kDay - 1, kDay}, {3 * kDay + 5, 3 * kDay + 6}}, "1101"},
-    {"began before", 1000000, 3, {{900000, 1000000 + kDay}}, "110"},
-    {"ends after", 1000000, 3, {{1000000 + 2 * kDay, 2000000}}, "001"},
-    {"ended less than a day before", 1000000, 2, {{900000, 1000000 - kDay + 1}}, "10"},
-    {"ended a day before", 1000000, 2, {{900000, 1000000 - kDay}}, "00"},
-    {"begins after", 1000000, 2, {{1000000 + 2 * kDay, 2000000}}, "00"},
-    {"ends before it begins", 0, 3, {{2 * kDay, kDay}}, "000"},
-    {"no days", 0, 0, {{0, kDay}}, "null"},
-    {"fewest days", 0, INT_MIN, {{INT_MIN, INT_MAX}}, "null"},
-    {"over the wrap of time", INT_MAX - 10, 2, {{INT_MIN + 100, INT_MIN + 200}}, "10"},
-    {"half the time apart", INT_MIN, 2, {{INT_MAX, INT_MAX}}, "10"},
-    {"all the time there is", 0, 2, {{INT_MIN, INT_MAX}}, "11"},
+    {"first and last second of a day", 0, 4, "0,345600", {{kDay, 2 * kDay - 1}}, "0100"},
+    {"across midnight", 0, 4, "0,345600", {{kDay - 1, kDay}, {3 * kDay + 5, 3 * kDay + 6}}, "1101"},
+    {"began before", 1000000, 3, "1000000,1259200", {{900000, 1000000 + kDay}}, "110"},
+    {"ends after", 1000000, 3, "1000000,1259200", {{1000000 + 2 * kDay, 2000000}}, "001"},
+    {"ended less than a day before", 1000000, 2, "1000000,1172800", {{900000, 1000000 - kDay + 1}}, "10"},
+    {"ended a day before", 1000000, 2, "1000000,1172800", {{900000, 1000000 - kDay}}, "00"},
+    {"begins after", 1000000, 2, "1000000,1172800", {{1000000 + 2 * kDay, 2000000}}, "00"},
+    {"ends before it begins", 0, 3, "0,259200", {{2 * kDay, kDay}}, "000"},
+    {"no days", 0, 0, "0,0", {{0, kDay}}, ""},
+    {"fewest days", 5, INT_MIN, "5,5", {{INT_MIN, INT_MAX}}, ""},
+    {"fewer than none", 5, -1, "5,-86395", {{0, INT_MAX}}, ""},
+    {"most days", 0, 128, "0,11059200", {{0, INT_MAX}}, std::string(128, '1')},
+    {"one too many", 0, 129, "0,11059200", {{0, INT_MAX}}, std::string(128, '1')},
+    {"as many as can be", 0, INT_MAX, "0,11059200", {{0, INT_MAX}}, std::string(128, '1')},
+    {"to the wrap of time", INT_MAX, 1, "2147483647,-2147397249", {{0, INT_MAX}}, "1"},
+    {"over the wrap of time", INT_MAX - 10, 2, "2147483637,-2147310859", {{INT_MIN + 100, INT_MIN + 200}}, "10"},
+    {"half the time apart", INT_MIN, 2, "-2147483648,-2147310848", {{INT_MAX, INT_MAX}}, "10"},
+    {"all the time there is", 0, 2, "0,172800", {{INT_MIN, INT_MAX}}, "11"},
 };
 
-TEST(SearchAvaiDate, MarksDays) {
+TEST(SearchAvaiDate, MarksUpTo128DaysAndAsksEvenForNone) {
     for (const auto& row : kDays) {
         SCOPED_TRACE(row.name);
         Search search("SearchAvaiDate");
-        search.platform.params["start"] = row.start;
-        search.platform.params["day_count"] = row.day_count;
+        Params({{"start", row.start}, {"day_count", row.day_count}})(search);
         for (const auto& [begin, end] : row.spans) {
-            search.platform.found_events.push_back(MakeEvent(1, begin, end));
+            search.found_events.push_back(MakeEvent(1, begin, end));
         }
         search.Run();
         std::string days;
-        for (const char* day = row.days; *day == '0' || *day == '1'; ++day) {
-            days += std::string(days.empty() ? "" : ",") + *day;
+        for (const char day : row.days) {
+            days += std::string(days.empty() ? "" : ",") + day;
         }
-        EXPECT_EQ(search.platform.calls.back(),
-                  "SetSuccess({\"available_day\":" + (days.empty() ? "null" : "[" + days + "]") +
-                      ",\"search_time\":" + row.start.asString() + "})");
-        EXPECT_EQ(search.All("EventListGetAll").size(), 1U) << "asked even for no days";
-    }
-}
-
-TEST(SearchAvaiDate, AnswersNoMoreThan128DaysAndWrapsItsEnd) {
-    struct Row {
-        int start, day_count;
-        std::ptrdiff_t slots;
-        const char* span;  // of the query
-    };
-    const Row rows[] = {
-        {0, 128, 128, "0,11059200"},     {0, 129, 128, "0,11059200"},
-        {0, INT_MAX, 128, "0,11059200"}, {INT_MAX, 1, 1, "2147483647,-2147397249"},
-        {5, INT_MIN, 0, "5,5"},          {5, -1, 0, "5,-86395"},
-    };
-    for (const auto& row : rows) {
-        SCOPED_TRACE(row.day_count);
-        Search search("SearchAvaiDate");
-        search.platform.params["start"] = row.start;
-        search.platform.params["day_count"] = row.day_count;
-        search.platform.found_events = {MakeEvent(1, 0, INT_MAX)};
-        search.Run();
-        EXPECT_THAT(search.All("EventListGetAll"),
-                    ElementsAre("EventListGetAll(0,0," + std::string(row.span) + ",2,99,-1,-1,camera_id)"));
-        const std::string& answer = search.platform.calls.back();
-        const std::string days = answer.substr(0, answer.find(']'));
-        EXPECT_EQ(days.find('[') == std::string::npos ? 0 : std::count(days.begin(), days.end(), ',') + 1, row.slots);
+        EXPECT_EQ(search.calls.back(), "SetSuccess({\"available_day\":" + (days.empty() ? "null" : "[" + days + "]") +
+                                           ",\"search_time\":" + std::to_string(row.start) + "})");
+        EXPECT_THAT(search.CallsOf("EventListGetAll"),
+                    ElementsAre("EventListGetAll(0,0," + std::string(row.query) + ",2,99,-1,-1,camera_id)"));
     }
 }
 
@@ -141,14 +110,14 @@ TEST(SearchAvaiDate, TakesTheListedCamerasThatThereAre) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.list);
         Search search("SearchAvaiDate");
-        search.platform.params["cameralists"] = row.list;
-        search.platform.mount_cameras[5];  // a record without an id
-        search.platform.mount_cameras[0] = MakeCamera(0, 1);
+        search.params["cameralists"] = row.list;
+        search.mount_cameras[5];  // a record without an id
+        search.mount_cameras[0] = MakeCamera(0, 1);
         search.Run();
         const std::string ids = row.ids;
-        EXPECT_EQ(search.All("EventListGetAll"),
+        EXPECT_EQ(search.CallsOf("EventListGetAll"),
                   ids.empty() ? Calls{} : Calls{"EventListGetAll(0,0,1000000,1086400," + ids + ",99,-1,-1,camera_id)"});
-        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"available_day\":[0],\"search_time\":1000000})");
+        EXPECT_EQ(search.calls.back(), "SetSuccess({\"available_day\":[0],\"search_time\":1000000})");
     }
 }
 
@@ -191,16 +160,16 @@ TEST(EventSearch, Rejects) {
     const auto check = [](const char* method, const RejectedRow& row) {
         SCOPED_TRACE(std::string(method) + " " + row.name);
         Search search(method);
-        row.before(search.platform);
+        row.before(search);
         search.Run();
-        const auto& logs = search.platform.logs;
+        const auto& logs = search.logs;
         ASSERT_EQ(logs.size(), row.log.empty() ? 0U : 1U);
         if (!logs.empty()) {
             EXPECT_EQ(logs[0].text, row.log);
             EXPECT_EQ(logs[0].file + " " + logs[0].func, std::string("multiplayer Handle") + method);
             EXPECT_EQ(logs[0].categ + logs[0].level, "player1");
         }
-        const auto calls = search.All("");
+        const auto calls = search.calls;
         EXPECT_THAT(calls.at(calls.size() - 2 - logs.size()), testing::StartsWith(row.last));
         EXPECT_THAT(calls.back(), row.code == 0 ? testing::StartsWith("SetSuccess(")
                                                 : testing::StartsWith("SetError(" + std::to_string(row.code) +
@@ -218,11 +187,11 @@ TEST(EventSearch, Rejects) {
 TEST(EventSearch, AGroupDecidesAloneWhichCamerasItHas) {
     for (const char* method : {"SearchAvaiDate", "EnumEvent"}) {
         Search search(method);
-        Params({{"camGrpId", 1}, {"mount_id", 3}, {"cameralists", "12,2"}})(search.platform);
+        Params({{"camGrpId", 1}, {"mount_id", 3}, {"cameralists", "12,2"}})(search);
         search.Run();
-        EXPECT_EQ(search.platform.CallsFrom("CamGroup::Load").at(1), "GetCamMap(1)");
-        ASSERT_EQ(search.All("EventListGetAll").size(), 1U) << "a denied camera of the group, none outside it";
-        EXPECT_THAT(search.All("EventListGetAll")[0],
+        EXPECT_EQ(search.CallsFrom("CamGroup::Load").at(1), "GetCamMap(1)");
+        ASSERT_EQ(search.CallsOf("EventListGetAll").size(), 1U) << "a denied camera of the group, none outside it";
+        EXPECT_THAT(search.CallsOf("EventListGetAll")[0],
                     testing::AllOf(testing::StartsWith("EventListGetAll(3,"), testing::HasSubstr(",12,")));
     }
 }
@@ -230,21 +199,21 @@ TEST(EventSearch, AGroupDecidesAloneWhichCamerasItHas) {
 TEST(EventSearch, TracesTheRequestAtLevel5) {
     for (const int level : {4, 5}) {
         Search search("Other");
-        search.platform.log_cfg.m_CategLevel[68] = level;
-        search.platform.params[""]["a"] = 1;
+        search.log_cfg.m_CategLevel[68] = level;
+        search.params[""]["a"] = 1;
         search.Run();
-        EXPECT_EQ(search.All("log"),
+        EXPECT_EQ(search.CallsOf("log"),
                   (level == 4 ? Calls{} : Calls{"log player/5 Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
-        EXPECT_EQ(search.All("").size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
+        EXPECT_EQ(search.calls.size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
     }
 }
 
 TEST(EnumEvent, AsksInOrder) {
     Search search("EnumEvent");
-    search.platform.params["mount_id"] = 3;
-    search.platform.params["reason"] = 259;
+    search.params["mount_id"] = 3;
+    search.params["reason"] = 259;
     search.Run();
-    EXPECT_EQ(search.platform.calls,
+    EXPECT_EQ(search.calls,
               (Calls({"GetAPIMethod()", "GetParam(mount_id,0)", "GetParam(camGrpId,0)", "GetParam(from,0)",
                       "GetParam(to,0)", "GetParam(interval,5)", "GetParam(recording,false)", "GetParam(reason,0)",
                       "GetParam(cameralists,\"\")"}) +
@@ -260,14 +229,14 @@ TEST(EnumEvent, DescribesEachEvent) {
         Event event = MakeEvent(31, 1000001, 1000002, 7);
         event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
         event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
-        search.platform.found_events = {event, event};
-        Event& other = search.platform.found_events.back();
+        search.found_events = {event, event};
+        Event& other = search.found_events.back();
         other.m_CamId = 2, other.m_blArchived = true, other.m_blRecording = false, other.m_Size = 1ULL << 43;
-        search.platform.muted_cameras = {4};
-        search.platform.mount_cameras[0] = MakeCamera(0, 1);
-        search.platform.mount_cameras[1] = MakeCamera(1, CAM_VIDEO_MJPEG);
-        search.platform.rec_log_result = rec_log_result;
-        Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search.platform);
+        search.muted_cameras = {4};
+        search.mount_cameras[0] = MakeCamera(0, 1);
+        search.mount_cameras[1] = MakeCamera(1, CAM_VIDEO_MJPEG);
+        search.rec_log_result = rec_log_result;
+        Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search);
         search.Run();
         Json::Value first, expected;
         std::istringstream(
@@ -290,17 +259,17 @@ TEST(EnumEvent, DescribesEachEvent) {
             queries.push_back("EventListGetAll(0,-1,1000000,1000060," + std::to_string(id) + ",0,0," +
                               (id == 1 ? "1" : "6") + ",camera_id)");
         }
-        EXPECT_EQ(search.platform.calls.back(), "SetSuccess(" + Text(expected) + ")");
-        EXPECT_EQ(search.All("EventListGetAll"), queries);
+        EXPECT_EQ(search.calls.back(), "SetSuccess(" + Text(expected) + ")");
+        EXPECT_EQ(search.CallsOf("EventListGetAll"), queries);
     }
 }
 
 TEST(EnumEvent, OfNoCameraIsAnEmptyList) {
     for (const char* list : {"", "7,8"}) {
         Search search("EnumEvent");
-        search.platform.params["cameralists"] = list;
+        search.params["cameralists"] = list;
         search.Run();
-        EXPECT_EQ(search.platform.calls.back(), "SetSuccess({\"camera\":[]})");
+        EXPECT_EQ(search.calls.back(), "SetSuccess({\"camera\":[]})");
     }
 }
 
@@ -339,16 +308,16 @@ TEST(EnumEvent, MarksCoverage) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         Search search("EnumEvent");
-        Params({{"from", row.from}, {"to", row.to}, {"interval", -3}, {"cameralists", "2,4"}})(search.platform);
-        search.platform.found_events = {row.events.begin(), row.events.end()};
-        search.platform.on_call = [&](const std::string& call) {
+        Params({{"from", row.from}, {"to", row.to}, {"interval", -3}, {"cameralists", "2,4"}})(search);
+        search.found_events = {row.events.begin(), row.events.end()};
+        search.on_call = [&](const std::string& call) {
             if (call.rfind("EventListGetAll", 0) == 0 && call.find(",4,") != std::string::npos) {
-                search.platform.found_events.clear();
+                search.found_events.clear();
             }
         };
         search.Run();
         EXPECT_THAT(
-            search.All("FillRecLogMap"),
+            search.CallsOf("FillRecLogMap"),
             ElementsAre("FillRecLogMap(log," + std::string(row.seconds) + ",-3)",
                         "FillRecLogMap(log," + std::string(static_cast<std::size_t>(row.to - row.from), '.') + ",-3)"))
             << "and nothing stays for the next camera";

@@ -17,19 +17,22 @@ const Calls kDispatch = {"GetAPIMethod()", "GetParam(camera,0)", "GetParam(snaps
 const Calls kItem = kDispatch + kSignals + Calls{"GetParam(itemType,0)"};
 const Calls kCamera = kItem + Calls{"GetParam(isFromPlugin,0)", "GetParam(profileType,-1)", "Load(5,0,0)"};
 const Calls kStream = {"StartLive(5,51)", "LiveStreamFifoAt(5,51)"};
-// A pass that finds no picture and ends the output; then the end of the stream.
-const Calls kLastPass = {"UpdateStamp()", "ReadLatest(10001,position)", "ReadFinish(null,1,position)", "usleep(10000)"};
-const Calls kStart = {"StartRead(position)"};
-const Calls kClose = {"StopRead(position)", "shmdt()", "SetEnableOutput(0)"};
+const Calls kSnapshot = kDispatch + Calls{"Load(5,0,0)"};
+const Calls kAttach = kSnapshot + Calls{"GetLiveProfile()", "GetUiStreamNo(1)", "LiveStreamFifoAt(5,51)"};
+const Calls kSent =
+    kAttach + Calls{"ReadLatest()", "fflush()", "ReadFinish(entry,0,null)", "shmdt()", "SetEnableOutput(0)"};
 
 struct RequestRow {
     const char* name;
     Change script;
     int error;
     Calls calls;
+    std::string output = "";  // written directly, not through the platform
 };
 
 TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
+    const Change snapshot = Params({{"snapshot", 1}});
+    const std::string head = "Content-type: image/jpeg\r\nContent-length: ";
     const Calls own_profile = kCamera + Calls{"GetLiveProfile()", "GetUiStreamNo(1)"};
     const RequestRow rows[] = {
         {"another method", [](auto& p) { p.method = "Stop"; }, 0, {"GetAPIMethod()"}},
@@ -38,7 +41,7 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
         {"negative camera", [](auto& p) { p.params["camera"] = -1; }, 401, kDispatch},
         {"snapshot before item type",
          [](auto& p) { p.params["snapshot"] = p.params["itemType"] = 1, p.cameras.clear(); }, 400,
-         kDispatch + Calls{"Load(5,0,0)", "log Failed to load camera [5].\n"}},
+         kSnapshot + Calls{"log Failed to load camera [5].\n"}},
         {"e-map", [](auto& p) { p.params["itemType"] = 1, p.has_emap = false; }, 400,
          kItem + Calls{"GetLoginUID()", "IsCmsHost()", "Emap::Load(5)", "log Cannot load emap id = 5.\n"}},
         {"other item type", [](auto& p) { p.params["itemType"] = 2; }, 0, kItem},
@@ -68,17 +71,28 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
          kDispatch + Calls{kSignals[0], "log Fail to set sigaction [SIGINT].\n", kSignals[1], kSignals[2], kSignals[3],
                            "log Fail to set sigaction [SIGPIPE].\n", "GetParam(itemType,0)"}},
         {"plugin", [](auto& p) { p.params["isFromPlugin"] = 1; }, 0,
-         own_profile + kStream + kStart + Calls{"Write(image/jpeg,null,0,null)", "fflush()"} + kLastPass + kClose},
+         own_profile + kStream + kStart + Calls{"Write(image/jpeg,null,0,null)", "fflush()"} + Empty(10001) + kClose},
         {"isFromPlugin 2", [](auto& p) { p.params["isFromPlugin"] = 2; }, 0,
-         own_profile + kStream + kStart + kLastPass + kClose},
+         own_profile + kStream + kStart + Empty(10001) + kClose},
+        {"snapshot of another codec, nor a stream",
+         snapshot + [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_stream = false; }, 400,
+         kSnapshot + Calls{"log The video codec of cam[5] NOT mjpg.\n"}},
+        {"snapshot of no stream", snapshot + [](auto& p) { p.has_stream = false; }, 400,
+         kAttach + Calls{"log Failed to attach cam[5] live stream buf\n"}},
+        {"snapshot of an empty stream", snapshot, 400, kAttach + Calls{"ReadLatest()"}},
+        {"snapshot: picture behind its offset", snapshot + Pictures({{{1, "xxx\xff\xd8\n", 3}}}), 0, kSent,
+         head + "3\r\n\r\n\xff\xd8\n"},
+        {"snapshot: empty picture", snapshot + Pictures({{{1, "xxx", 3}}}), 0, kSent, head + "0\r\n\r\n"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         LiveView test;
-        row.script(test.platform);
-        LiveHandler handler(test.platform);
+        row.script(test);
+        LiveHandler handler(test);
+        StdoutCapture capture;
         handler.HandleProcess();
-        EXPECT_EQ(test.platform.CallsFrom("GetAPIMethod"), row.calls);
+        EXPECT_EQ(capture.Text(), row.output);
+        EXPECT_EQ(test.CallsFrom("GetAPIMethod"), row.calls);
         EXPECT_EQ(handler.m_ErrCode, row.error);
         EXPECT_EQ(gblStop, 0);
     }
@@ -88,64 +102,9 @@ TEST(LiveViewRequest, SignalsSetTheStopFlag) {
     EXPECT_EQ(kStopAtLoad, 0);
     for (const int signal : {SIGINT, SIGQUIT, SIGTERM, SIGPIPE}) {
         LiveView test;
-        LiveHandler(test.platform).SetupSignalHandler();
+        LiveHandler(test).SetupSignalHandler();
         std::raise(signal);
         EXPECT_EQ(gblStop, 1) << signal;
-    }
-}
-
-struct SnapshotRow {
-    const char* name;
-    Change script;
-    int error;
-    Calls calls;
-    std::string output;
-};
-
-TEST(LiveViewSnapshot, WritesOnePictureOrNothing) {
-    const Calls attach = {"Load(5,0,0)", "GetLiveProfile()", "GetUiStreamNo(1)", "LiveStreamFifoAt(5,51)"};
-    const Calls sent =
-        attach + Calls{"ReadLatest()", "fflush()", "ReadFinish(entry,0,null)", "shmdt()", "SetEnableOutput(0)"};
-    const auto head = [](int size) {
-        return "Content-type: image/jpeg\r\nContent-length: " + std::to_string(size) + "\r\n\r\n";
-    };
-    const SnapshotRow rows[] = {
-        {"picture behind its offset",
-         [](auto& p) {
-             p.frames = {ScriptedFrame{1, "xxx\xff\xd8\n", 3}};
-         },
-         0, sent, head(3) + "\xff\xd8\n"},
-        {"empty picture",
-         [](auto& p) {
-             p.frames = {ScriptedFrame{1, "xxx", 3}};
-         },
-         0, sent, head(0)},
-        {"unknown camera",
-         [](auto& p) { p.cameras.clear(); },
-         400,
-         {"Load(5,0,0)", "log Failed to load camera [5].\n"},
-         ""},
-        {"another codec, nor a stream",
-         [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_stream = false; },
-         400,
-         {"Load(5,0,0)", "log The video codec of cam[5] NOT mjpg.\n"},
-         ""},
-        {"no stream", [](auto& p) { p.has_stream = false; }, 400,
-         attach + Calls{"log Failed to attach cam[5] live stream buf\n"}, ""},
-        {"empty stream", [](auto&) {}, 400, attach + Calls{"ReadLatest()"}, ""},
-    };
-    for (const auto& row : rows) {
-        SCOPED_TRACE(row.name);
-        LiveView test;
-        row.script(test.platform);
-        LiveHandler handler(test.platform);
-        StdoutCapture capture;
-        test.platform.calls.clear();
-        handler.SnapshotMjpgCam(5);
-        const Calls calls = test.platform.calls;  // before the capture's own flush
-        EXPECT_EQ(capture.Text(), row.output);
-        EXPECT_EQ(calls, row.calls);
-        EXPECT_EQ(handler.m_ErrCode, row.error);
     }
 }
 

@@ -15,18 +15,10 @@ using namespace lookhaven::test;
 
 namespace {
 
-const Calls kStart = {"StartRead(position)"};
-const Calls kClose = {"StopRead(position)", "shmdt()", "SetEnableOutput(0)"};
-Calls Read(int last_seq) {
-    return {"UpdateStamp()", "ReadLatest(" + std::to_string(last_seq) + ",position)"};
-}
 Calls Write(const std::string& data) {
     return {"Write(image/jpeg," + data + "," + std::to_string(data.size()) + ",null)", "fflush()"};
 }
 const Calls kDone = {"ReadFinish(entry,1,position)", "usleep(10000)"};
-Calls Empty(int last_seq) {
-    return Read(last_seq) + Calls{"ReadFinish(null,1,position)", "usleep(10000)"};
-}
 Calls TimeOut(int last_seq) {
     return Read(last_seq) + Calls{"ReadFinish(null,1,position)", "log live/4 Timeeout [Cam: 5]\n"};
 }
@@ -96,6 +88,10 @@ const LoopRow kLoop[] = {
      [](auto& p) { p.lock_result = EINVAL; },
      {},
      Empty(10001) + Exit("1", "0", "0")},
+    {"the lock of a dead owner",
+     [](auto& p) { std::thread([&] { pthread_mutex_lock(&p.common_cfg.m_Mutex); }).join(); },
+     {},
+     Empty(10001) + Exit("1", "0", "0")},
     {"time-out after a pause",
      Pause,
      {{"sleep(10)", [](auto& p) { p.common_cfg.m_blPause = p.monotonic_now < 1000030; }}},
@@ -115,6 +111,11 @@ const LoopRow kLoop[] = {
      Pictures({{{1, "A"}}}),
      {{"fflush()", Later(21)}},
      Read(10001) + Write("A") + kDone + Empty(1) + Exit("1", "0", "0")},
+    {"traces each picture at the highest level",
+     Pictures({{{1, "A"}}}) + [](auto& p) { p.log_cfg.m_CategLevel[32] = 6; },
+     {},
+     Read(10001) + Calls{Write("A")[0], "log live/6 Write frame [Cam: 5]\n", "fflush()"} + kDone + Empty(1) +
+         Exit("1", "0", "0")},
 };
 
 TEST(LiveViewLoop, RunsAndEndsInOrder) {
@@ -124,56 +125,25 @@ TEST(LiveViewLoop, RunsAndEndsInOrder) {
     }
 }
 
-TEST(LiveViewLoop, TracesEachPictureAtTheHighestLevel) {
-    LiveView test;
-    auto& platform = test.platform;
-    platform.log_cfg.m_CategLevel[32] = 6;
-    platform.frames = {ScriptedFrame{}};
-    LiveHandler(platform).LiveviewMjpgCam(5, 51, false);
-    EXPECT_EQ(platform.CallsFrom("log").at(0), "log live/6 Write frame [Cam: 5]\n");
-    EXPECT_EQ(platform.logs.size(), 2U);
-}
-
 TEST(LiveViewLoop, SkipsSizesOutOfRangeWithoutTakingTheirNumber) {
-    struct Row {
-        int length, offset;
-        bool sent;
-    };
-    for (const Row& row : {Row{0, 0, false}, Row{9, 9, false}, Row{1, 0, true}, Row{4, 5, false},
-                           Row{4194303 + 44, 44, true}, Row{4194304, 0, false}, Row{4, INT32_MIN, false}}) {
+    for (const SizeRow& row : kSizes) {
         SCOPED_TRACE(testing::Message() << row.length << " - " << row.offset);
         LiveView test;
-        test.platform.frames = {ScriptedFrame{8, "", row.offset, row.length}, {}};
-        LiveHandler(test.platform).LiveviewMjpgCam(5, 51, false);
-        EXPECT_EQ(test.platform.CallsFrom("Write").empty(), !row.sent);
-        EXPECT_EQ(test.platform.CallsFrom("usleep").at(2),
-                  row.sent ? "ReadLatest(8,position)" : "ReadLatest(10001,position)");
-        EXPECT_THAT(test.platform.calls, testing::Contains("ReadFinish(entry,1,position)"));
+        test.frames = {ScriptedFrame{8, "", row.offset, row.length}, {}};
+        LiveHandler(test).LiveviewMjpgCam(5, 51, false);
+        EXPECT_EQ(test.CallsOf("Write").empty(), !row.sent);
+        EXPECT_EQ(test.CallsOf("ReadLatest").at(1), row.sent ? "ReadLatest(8,position)" : "ReadLatest(10001,position)");
+        EXPECT_THAT(test.calls, testing::Contains("ReadFinish(entry,1,position)"));
     }
-}
-
-TEST(LiveViewLoop, RecoversTheLockOfADeadOwner) {
-    LiveView test;
-    auto& platform = test.platform;
-    std::thread([&] { pthread_mutex_lock(&platform.common_cfg.m_Mutex); }).join();
-    LiveHandler(platform).LiveviewMjpgCam(5, 51, false);
-    EXPECT_EQ(platform.CallsFrom("StartRead"), kStart + Empty(10001) + kClose);
-    EXPECT_EQ(pthread_mutex_lock(&platform.common_cfg.m_Mutex), 0) << "consistent again";
-    pthread_mutex_unlock(&platform.common_cfg.m_Mutex);
 }
 
 TEST(LiveViewLoop, SelfDeadlockThrowsAndLeavesTheSegment) {
     LiveView test;
-    auto& platform = test.platform;
-    pthread_mutex_lock(&platform.common_cfg.m_Mutex);
-    try {
-        LiveHandler(platform).LiveviewMjpgCam(5, 51, false);
-        ADD_FAILURE() << "no exception";
-    } catch (const std::runtime_error& error) {
-        EXPECT_STREQ(error.what(), "Potential self-deadlock detected!");
-    }
-    EXPECT_EQ(platform.CallsFrom("StartRead"), kStart);
-    pthread_mutex_unlock(&platform.common_cfg.m_Mutex);
+    pthread_mutex_lock(&test.common_cfg.m_Mutex);
+    EXPECT_THAT([&] { LiveHandler(test).LiveviewMjpgCam(5, 51, false); },
+                testing::ThrowsMessage<std::runtime_error>("Potential self-deadlock detected!"));
+    EXPECT_EQ(test.CallsFrom("StartRead"), kStart);
+    pthread_mutex_unlock(&test.common_cfg.m_Mutex);
 }
 
 }  // namespace

@@ -22,8 +22,8 @@ ScriptedFrame Delta(int seq, const std::string& data) {
 const Calls kOpen = {"StartRead(position)", "audio StartRead(audio position)", "ReadLatestIFrame()"};
 const Calls kNoStart = kOpen + Calls{"ReadIFrameFinish(null,null)"};
 const Calls kUpdate = {"GetVdoExtraData(1024)", "audio GetAdoExtraData(1024)"};
-const Calls kClose = {"StopRead(position)", "audio StopRead(audio position)", "shmdt()", "audio shmdt()",
-                      "SetEnableOutput(0)"};
+const Calls kEnd = {"StopRead(position)", "audio StopRead(audio position)", "shmdt()", "audio shmdt()",
+                    "SetEnableOutput(0)"};
 
 Calls WriteOf(const std::string& type, const std::string& data, const std::string& timestamp) {
     return {"Write(" + type + ",H264;AAC,V,A," + timestamp + "," + data + "," + std::to_string(data.size()) + ",null)",
@@ -52,7 +52,7 @@ Calls NothingNew(int video, int audio) {
 }
 const Calls kRest = {"usleep(10000)"};
 Calls Exit(const char* eof, const char* stop) {
-    return LoopExit(eof, "0", stop) + kClose;
+    return LoopExit(eof, "0", stop) + kEnd;
 }
 Calls Started(const std::string& data) {
     return kOpen + kUpdate + WriteKey(data) +
@@ -60,22 +60,23 @@ Calls Started(const std::string& data) {
                  "ReadIFrameFinish(entry,null)"};
 }
 
-Change Begins(const ScriptedFrame& newest, const ScriptedFrames& frames, const ScriptedFrames& audio = {}) {
-    return [=](ScriptedPlatform& p) { p.newest_key_frame = newest, p.frames = frames, p.audio_frames = audio; };
+Change Begins(const ScriptedFrame& newest, const ScriptedFrames& frames) {
+    return Pictures(frames) + [=](ScriptedPlatform& p) { p.newest_key_frame = newest; };
 }
+Change WithSound(const ScriptedFrames& frames) {
+    return [=](ScriptedPlatform& p) { p.audio_frames = frames; };
+}
+const Change kBoth = Begins(Key(40, "KK"), {Delta(41, "ddd")}) + WithSound({Delta(8, "s")});
 
 const LoopRow kRows[] = {
     {"begins with the newest key frame and forwards both media without a rest",
-     Begins(Key(40, "K"), {Delta(41, "d"), {}, Delta(0, "e")}, {Delta(8, "s"), Delta(9, "t")}),
+     Begins(Key(40, "K"), {Delta(41, "d"), {}, Delta(0, "e")}) + WithSound({Delta(8, "s"), Delta(9, "t")}),
      {},
      Started("K") + Video(40, WriteDelta("d")) + Audio(10001, WriteSound("s")) + Video(41, {}, "null") +
          Audio(8, WriteSound("t")) + Video(41, WriteDelta("e")) + Audio(9, {}, "null") + NothingNew(0, 9) + kRest +
          Exit("1", "0")},
     {"without one waits, dropping sound and frames that need an earlier one, whose numbers it takes",
-     [](auto& p) {
-         p.frames = {Delta(3, "d"), Key(4, "K")};
-         p.audio_frames = {Delta(1, "s"), Delta(2, "t")};
-     },
+     Pictures({Delta(3, "d"), Key(4, "K")}) + WithSound({Delta(1, "s"), Delta(2, "t")}),
      {},
      kNoStart + Video(10001, {}) + Audio(10001, {}) + kRest + Video(3, kUpdate + WriteKey("K")) +
          Audio(1, WriteSound("t")) + NothingNew(4, 2) + kRest + Exit("1", "0")},
@@ -104,24 +105,22 @@ const LoopRow kRows[] = {
      kNoStart + Video(10001, {}) + Audio(10001, {}, "null") + kRest + Video(1, {}) + Audio(10001, {}, "null") + kRest +
          Video(2, {}) + Audio(10001, {}, "null") + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},
     {"sound alone keeps it alive, and a long pass that wrote is no time-out",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "K");
-         p.frames.resize(3);
-         p.audio_frames = {Delta(8, "s")};
-     },
+     Begins(Key(40, "K"), {{}, {}, {}}) + WithSound({Delta(8, "s")}),
      {{"UpdateStamp()", Later(15)}},
      Started("K") + Video(40, {}, "null") + Audio(10001, WriteSound("s")) + NothingNew(40, 8) + kRest +
          NothingNew(40, 8) + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},
     {"failing output is logged for pictures of the loop only",
-     [](auto& p) {
-         p.newest_key_frame = Key(40, "K");
-         p.frames = {Delta(41, "d")};
-         p.audio_frames = {Delta(8, "s")};
-         p.flush_fails = true, p.write_result = -1;
-     },
+     kBoth + [](auto& p) { p.flush_fails = true, p.write_result = -1; },
      {},
-     Started("K") + Video(40, WriteDelta("d") + Calls{"log live/4 Failed to fflush data [Cam: 5, errno: 32]\n"}) +
+     Started("KK") + Video(40, WriteDelta("ddd") + Calls{"log live/4 Failed to fflush data [Cam: 5, errno: 32]\n"}) +
          Audio(10001, WriteSound("s")) + NothingNew(41, 8) + kRest + Exit("1", "0")},
+    {"traces each part at the highest level",
+     kBoth + [](auto& p) { p.log_cfg.m_CategLevel[32] = 6; },
+     {},
+     Started("KK") +
+         Video(40, Calls{WriteDelta("ddd")[0], "log live/6 Flush video frame. [FrameSize: 3]\n", "fflush()"}) +
+         Audio(10001, WriteSound("s") + Calls{"log live/6 Flush latest audio. [FrameSize: 1]\n"}) + NothingNew(41, 8) +
+         kRest + Exit("1", "0")},
 };
 
 TEST(MuxedLive, BeginsForwardsAndEnds) {
@@ -131,45 +130,19 @@ TEST(MuxedLive, BeginsForwardsAndEnds) {
 }
 
 TEST(MuxedLive, SkipsSizesOutOfRangeWithoutTakingTheirNumber) {
-    struct Size {
-        int length, offset;
-        bool sent;
-    };
-    for (const Size& size : {Size{0, 0, false}, Size{9, 9, false}, Size{1, 0, true}, Size{4194303 + 4, 4, true},
-                             Size{4194304, 0, false}}) {
-        SCOPED_TRACE(testing::Message() << size.length << " - " << size.offset);
+    for (const SizeRow& row : kSizes) {
+        SCOPED_TRACE(testing::Message() << row.length << " - " << row.offset);
         LiveView test;
-        auto& platform = test.platform;
-        platform.newest_key_frame = Key(40, "K");
-        platform.frames = {ScriptedFrame{41, "", size.offset, size.length}, {}};
-        platform.audio_frames = {ScriptedFrame{8, "", size.offset, size.length}};
-        LiveHandler(platform).LiveviewMpeg4Cam(5, 51);
-        const auto count = [&](const std::string& text) {
-            return std::count_if(platform.calls.begin(), platform.calls.end(),
-                                 [&](const auto& call) { return call.rfind(text, 0) == 0; });
-        };
-        EXPECT_EQ(count(size.sent ? "ReadNext(41,position)" : "ReadNext(40,position)"), size.sent ? 2 : 3);
-        EXPECT_EQ(count(size.sent ? "audio ReadNext(8,audio position)" : "audio ReadNext(10001,audio position)"),
-                  size.sent ? 2 : 3);
-        EXPECT_EQ(count("Write("), size.sent ? 3 : 1);
+        test.newest_key_frame = Key(40, "K");
+        test.frames = {ScriptedFrame{41, "", row.offset, row.length}, {}};
+        test.audio_frames = {ScriptedFrame{8, "", row.offset, row.length}};
+        LiveHandler(test).LiveviewMpeg4Cam(5, 51);
+        EXPECT_EQ(test.CallsOf(row.sent ? "ReadNext(41,position)" : "ReadNext(40,position)").size(),
+                  row.sent ? 2U : 3U);
+        EXPECT_EQ(test.CallsOf(row.sent ? "audio ReadNext(8,audio" : "audio ReadNext(10001,audio").size(),
+                  row.sent ? 2U : 3U);
+        EXPECT_EQ(test.CallsOf("Write(").size(), row.sent ? 3U : 1U);
     }
-}
-
-TEST(MuxedLive, TracesEachPartAtTheHighestLevel) {
-    LiveView test;
-    auto& platform = test.platform;
-    platform.log_cfg.m_CategLevel[32] = 6;
-    platform.newest_key_frame = Key(40, "KK");
-    platform.frames = {Delta(41, "ddd")};
-    platform.audio_frames = {Delta(8, "s")};
-    LiveHandler(platform).LiveviewMpeg4Cam(5, 51);
-    std::string lines;
-    for (const auto& log : platform.logs) {
-        lines += log.level + " " + log.text;
-    }
-    EXPECT_THAT(lines, testing::StartsWith("5 Flush latest i-frame. [FrameSize: 2]\n"
-                                           "6 Flush video frame. [FrameSize: 3]\n"
-                                           "6 Flush latest audio. [FrameSize: 1]\n5 Exit loop"));
 }
 
 }  // namespace

@@ -44,7 +44,7 @@ TEST(Playback, ReadsAndCallsInOrder) {
     };
     for (const auto& row : rows) {
         Player player(row.method);
-        player.platform.broken_frames = {1};
+        player.broken_frames = {1};
         EXPECT_EQ(player.Run({}, 0), "");
         EXPECT_EQ(player.calls, Calls({"GetSessionID()", "GetAPIMethod()"}) + row.calls + Calls{"SetSuccess(null)"});
         EXPECT_EQ(PidFile(), "none");
@@ -125,10 +125,10 @@ TEST(Playback, FailuresHaveTheirAnswers) {
             const Outcome& expected = method == kByIndex ? row.by_index : row.by_time;
             const char* handler = method == kByIndex ? "HandlePlayEvent" : "HandlePlayEventNoFrameId";
             Player player(method);
-            row.before(player.platform);
+            row.before(player);
             EXPECT_EQ(player.Run({{1, row.at_first_picture}}, 2), expected.redirect ? kRedirect : "");
             std::string text;
-            for (const auto& log : player.platform.logs) {
+            for (const auto& log : player.logs) {
                 EXPECT_EQ(log.file + " " + log.categ + log.level, "mjpegstreamer player1");
                 text += (log.func == handler ? "@" : log.func) + ": " + log.text;
             }
@@ -153,9 +153,9 @@ TEST(Playback, KindDecidesTheRecord) {
                            Row{9, true, "Event::Load(3,7,0,0)"}}) {
         SCOPED_TRACE(row.load);
         Player player(kByIndex);
-        Params({{"mountid", 7}, {"recEvtType", row.kind}, {"blAnalyEvent", row.is_analytics}})(player.platform);
+        Params({{"mountid", 7}, {"recEvtType", row.kind}, {"blAnalyEvent", row.is_analytics}})(player);
         player.Run({}, 1);
-        EXPECT_EQ(player.platform.CallsFrom("sigaction(12").at(1), row.load);
+        EXPECT_EQ(player.CallsFrom("sigaction(12").at(1), row.load);
         EXPECT_EQ(player.Frames(), "0:P0 ");
     }
 }
@@ -174,12 +174,12 @@ TEST(Playback, OnlyAGrowingEventIsFlushed) {
           Row{1, 1, true, 0, load + Calls{"DoEventTimelyPlay(1,0)"} + load}, Row{1, 3, false, 0, load + load},
           Row{1, 0, true, 0, load + load}, Row{2, 3, true, 0, load}, Row{0, 3, true, 0, load}}) {
         Player player(kByTime);
-        player.platform.params["flushHeader"] = row.flush;
-        player.platform.timely_play_result = row.result;
-        player.platform.events[3].m_Id = row.id;
-        player.platform.events[3].m_blRecording = row.is_recording;
+        player.params["flushHeader"] = row.flush;
+        player.timely_play_result = row.result;
+        player.events[3].m_Id = row.id;
+        player.events[3].m_blRecording = row.is_recording;
         player.Run({}, 1);
-        const Calls from = player.platform.CallsFrom("Event::Load");
+        const Calls from = player.CallsFrom("Event::Load");
         EXPECT_EQ(Calls(from.begin(), std::find(from.begin(), from.end(), "IsFileExist(/rec/3)")), row.calls);
         EXPECT_EQ(player.Frames(), "P0 ");
     }
@@ -207,7 +207,7 @@ TEST(Playback, PassesTheSessionOn) {
         for (int mode = 0; mode < 6; ++mode) {
             SCOPED_TRACE(row.name + std::to_string(mode));
             Player player(mode < 3 ? kByIndex : kByTime);
-            modes[mode % 3](player.platform);
+            modes[mode % 3](player);
             if (row.plan.begin()->first < 0 && mode % 3 == 2) {
                 continue;  // sampling has no wait
             }
@@ -221,7 +221,7 @@ TEST(Playback, PassesTheSessionOn) {
             EXPECT_EQ(static_cast<std::size_t>(std::count(frames.begin(), frames.end(), ' ')), row.pictures);
             EXPECT_THAT(player.calls.at(player.calls.size() - 2), testing::MatchesRegex(row.last));
             EXPECT_EQ(PidFile(), row.pid_file);
-            EXPECT_TRUE(player.platform.logs.empty());
+            EXPECT_TRUE(player.logs.empty());
         }
     }
 }

@@ -21,17 +21,15 @@ struct LiveHandler : LiveviewSrcHandler {
 };
 
 // A "Play" request of an admitted caller for camera 5, which streams MJPEG.
-struct LiveView {
+struct LiveView : ScriptedPlatform {
     LiveView() {
         gblStop = 0;
-        platform.is_authorized = platform.has_app_priv = true;
-        platform.method = "Play";
-        platform.cameras[5] = MakeCamera(5, CAM_VIDEO_MJPEG);
-        platform.params["camera"] = 5;
+        is_authorized = has_app_priv = true;
+        method = "Play";
+        cameras[5] = MakeCamera(5, CAM_VIDEO_MJPEG);
+        params["camera"] = 5;
     }
     ~LiveView() { gblStop = 0; }
-
-    ScriptedPlatform platform;
 };
 
 struct LoopRow {
@@ -51,11 +49,20 @@ inline Change Later(int seconds) {
     return [seconds](ScriptedPlatform& p) { p.now += seconds; };
 }
 
+// The size of one frame of a ring, and whether it is in range.
+struct SizeRow {
+    int length, offset;
+    bool sent;
+};
+
+inline const SizeRow kSizes[] = {
+    {0, 0, false},       {9, 9, false},        {1, 0, true}, {4, 5, false}, {4194303 + 44, 44, true},
+    {4194304, 0, false}, {4, INT32_MIN, false}};
+
 // Plays the row as stream 51 of camera 5. func: the handler's function, which each log line names.
 inline void RunLoop(const LoopRow& row, const char* func, const std::function<void(LiveHandler&)>& stream) {
     SCOPED_TRACE(row.name);
-    LiveView test;
-    ScriptedPlatform& platform = test.platform;
+    LiveView platform;
     platform.log_cfg.m_CategLevel[32] = 5;
     row.before(platform);
     platform.on_call = [&](const std::string& call) {
@@ -71,7 +78,19 @@ inline void RunLoop(const LoopRow& row, const char* func, const std::function<vo
     for (const auto& log : platform.logs) {
         EXPECT_EQ(log.file + " " + log.func, std::string("liveview_src ") + func);
     }
+    EXPECT_EQ(pthread_mutex_trylock(&platform.common_cfg.m_Mutex), 0) << "neither held nor inconsistent";
+    pthread_mutex_unlock(&platform.common_cfg.m_Mutex);
 }
+
+// What the MJPEG loop calls: its begin, a pass that finds no picture, its end.
+inline const Calls kStart = {"StartRead(position)"};
+inline Calls Read(int last_seq) {
+    return {"UpdateStamp()", "ReadLatest(" + std::to_string(last_seq) + ",position)"};
+}
+inline Calls Empty(int last_seq) {
+    return Read(last_seq) + Calls{"ReadFinish(null,1,position)", "usleep(10000)"};
+}
+inline const Calls kClose = {"StopRead(position)", "shmdt()", "SetEnableOutput(0)"};
 
 // The line that ends the loop.
 inline Calls LoopExit(const char* eof, const char* error, const char* stop) {

@@ -39,14 +39,14 @@ inline std::string PidFile() {
 }
 
 // A request to play event 3, of 100 frames at 10 fps, as stream 5.
-struct Player {
-    explicit Player(const char* method) {
+struct Player : ScriptedPlatform {
+    explicit Player(const char* played) {
         g_PlayerStop = g_PlayerCheckPid = g_PlayerPause = 0;
-        platform.method = method;
-        platform.session_id = kSession;
-        platform.log_cfg.m_CategLevel[68] = 1;
-        platform.events[3] = MakeEvent(3, 100, 110);
-        platform.params = {{"eventid", 3}, {"timestamp", 5}};
+        method = played;
+        session_id = kSession;
+        log_cfg.m_CategLevel[68] = 1;
+        events[3] = MakeEvent(3, 100, 110);
+        params = {{"eventid", 3}, {"timestamp", 5}};
     }
     ~Player() { std::remove(kPidFile.c_str()); }
 
@@ -54,51 +54,44 @@ struct Player {
     // happen; 0: before the first; -2: in the wait after the second. SIGTERM is raised at the last picture.
     std::string Run(const std::map<int, Change>& plan, int last_picture) {
         int pictures = 0;
-        platform.on_call = [&](const std::string& call) {
+        on_call = [&](const std::string& call) {
             const bool is_picture = call.rfind("Write(image/jpeg", 0) == 0;
             pictures += is_picture;
             const bool is_wait = call == "Delay()";
             const auto planned = plan.find(is_wait ? -pictures : pictures);
             if ((is_picture || is_wait || call == "BeginTiming()") && planned != plan.end()) {
-                planned->second(platform);
+                planned->second(*this);
             }
             if (is_picture && pictures == last_picture) {
                 std::raise(SIGTERM);
             }
         };
         StdoutCapture capture;
-        platform.calls.clear();
-        MjpegStreamHandler(platform.Request(), platform.Response()).HandleProcess();
-        calls = platform.calls;  // before the capture's own flush
+        MjpegStreamHandler(Request(), Response()).HandleProcess();
         return capture.Text();
     }
 
     // Of each call that begins with the text, what follows it up to the next comma or bracket; joined.
     std::string All(const std::string& text) const {
         std::string all;
-        for (const auto& call : calls) {
-            if (call.rfind(text, 0) == 0) {
-                all += call.substr(text.size(), call.find_first_of(",)", text.size()) - text.size()) + " ";
-            }
+        for (const auto& call : CallsOf(text)) {
+            all += call.substr(text.size(), call.find_first_of(",)", text.size()) - text.size()) + " ";
         }
         return all;
     }
 
     // The pictures sent: 4:P4 for one after its index, P4 for one without.
     std::string Frames() const {
-        std::string frames;
+        std::string sent;
         for (const auto& call : calls) {
             if (call.rfind("Write(text/plain,", 0) == 0) {
-                frames += call.substr(17, call.find("\r\n,") - 17) + ":";
+                sent += call.substr(17, call.find("\r\n,") - 17) + ":";
             } else if (call.rfind("Write(image/jpeg,", 0) == 0) {
-                frames += call.substr(17, call.find(',', 17) - 17) + " ";
+                sent += call.substr(17, call.find(',', 17) - 17) + " ";
             }
         }
-        return frames;
+        return sent;
     }
-
-    ScriptedPlatform platform;
-    Calls calls;
 };
 
 inline Change Frames(int count) {

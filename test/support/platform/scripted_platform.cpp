@@ -3,6 +3,7 @@
 // Test double of the platform's request, admission, privileges and log; construction and destruction of the script.
 #include "test/support/platform/scripted_platform.h"
 
+#include <algorithm>
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
@@ -101,6 +102,13 @@ Calls ScriptedPlatform::CallsFrom(const std::string& text) const {
     return {first, calls.end()};
 }
 
+Calls ScriptedPlatform::CallsOf(const std::string& text) const {
+    Calls found;
+    std::copy_if(calls.begin(), calls.end(), std::back_inserter(found),
+                 [&](const auto& call) { return call.rfind(text, 0) == 0; });
+    return found;
+}
+
 std::string Text(const Json::Value& value) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
@@ -108,19 +116,19 @@ std::string Text(const Json::Value& value) {
 }
 
 StdoutCapture::StdoutCapture() : saved_(dup(STDOUT_FILENO)), file_(std::tmpfile()) {
-    std::fflush(stdout);
+    std::fflush(nullptr);
     dup2(fileno(file_), STDOUT_FILENO);
 }
 
 StdoutCapture::~StdoutCapture() {
-    std::fflush(stdout);
+    std::fflush(nullptr);
     dup2(saved_, STDOUT_FILENO);
     close(saved_);
     std::fclose(file_);
 }
 
 std::string StdoutCapture::Text() {
-    std::fflush(stdout);
+    std::fflush(nullptr);
     std::string text(4096, '\0');
     text.resize(static_cast<std::size_t>(pread(fileno(file_), text.data(), text.size(), 0)));
     return text;

@@ -69,6 +69,8 @@ class ScriptedPlatform {
     VEXO::APIResponse* Response();
     // The recorded calls, from the first that begins with the text.
     Calls CallsFrom(const std::string& text) const;
+    // The recorded calls that begin with the text.
+    Calls CallsOf(const std::string& text) const;
 
     Calls calls;
     std::vector<LogLine> logs;
@@ -159,7 +161,7 @@ Camera MakeCamera(int id, int video_type, bool enabled = true);
 // A saved event with sound.
 Event MakeEvent(int id, int start, int end, int rec_method = REC_METHOD_CONTINUOUS);
 
-// Redirects standard output to a file while it exists.
+// Redirects standard output to a file while it exists. Its own flushes are not recorded.
 class StdoutCapture {
   public:
     StdoutCapture();
