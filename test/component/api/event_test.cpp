@@ -69,14 +69,13 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
 }
 
 TEST_F(EventApi, RefusesBadInput) {
-    struct Case {
+    const std::string late = std::to_string(base::WallMillis() / 1000 + 7200);
+    const struct {
         const char* query;
         std::string form;  // empty: a GET
         int status;
         bool as_viewer = false;
-    };
-    const std::string late = std::to_string(base::WallMillis() / 1000 + 7200);
-    const Case cases[] = {
+    } cases[] = {
         {"Event&version=1&method=Mark&kind=pos&camera=1", "", 405},
         {"Event&version=1&method=Mark", "camera=1", 400},
         {"Event&version=1&method=Mark", "kind=fire&camera=1", 400},
@@ -113,7 +112,7 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Catalog&version=1&method=Cameras", "", 404},
         {"Catalog&version=2&method=Groups", "", 404},
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         const Answer answer = Ask(each.query, each.form, each.as_viewer);
         EXPECT_EQ(answer.status, each.status) << each.query << ' ' << each.form.substr(0, 80) << answer.body;
     }
@@ -139,11 +138,11 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
         EXPECT_EQ(told[told["kind"] == "event" ? "start" : "time"], 1'772'366'400);
         EXPECT_EQ(told["frame_count"].isInt(), told["kind"] == "event");
     }
+    const std::string download = "Event&version=1&method=Download&event=" + std::to_string(event);
     std::ofstream(footage_.FileOf(event)) << "";
-    EXPECT_EQ(Ask("Event&version=1&method=Download&event=" + std::to_string(event)).status, 404) << "an empty file";
+    EXPECT_EQ(Ask(download).status, 404) << "an empty file";
     std::filesystem::remove(footage_.FileOf(event));
-    EXPECT_EQ(Ask("Event&version=1&method=Download&event=" + std::to_string(event)).status, 404)
-        << "a file that is gone";
+    EXPECT_EQ(Ask(download).status, 404) << "a file that is gone";
 }
 
 TEST_F(EventApi, ListsGroupsAndMountsThatTheCallerMaySee) {
@@ -152,10 +151,7 @@ TEST_F(EventApi, ListsGroupsAndMountsThatTheCallerMaySee) {
     const int yard = groups.Add({0, "Yard", {3}});
     store::Users(footage_.Records()).DenyGroup(2, yard);
     viewer_ = host_.LogIn("guest").secret;
-    store::Mount empty;
-    empty.name = "Empty";
-    empty.path = "/nowhere";
-    store::Mounts(footage_.Records()).Add(empty);
+    store::Mounts(footage_.Records()).Add({.name = "Empty", .path = "/nowhere"});
     const auto listed = [&](const char* method, const char* key, bool as_viewer) {
         std::string text;
         const Json::Value answer = Ask(std::string("Catalog&version=1&method=") + method, "", as_viewer).Json();

@@ -37,11 +37,10 @@ Json::Value Param(const http::Request& request, const std::string& name, const J
 }
 
 TEST(GetParam, TakesTextAsJsonOnlyWhenNothingIsLost) {
-    struct Case {
+    const struct {
         const char* text;  // escaped as in a query
         Json::Value expected;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"5", 5},
         {"-3", -3},
         {"2147483648", Json::Int64(2147483648)},
@@ -69,7 +68,7 @@ TEST(GetParam, TakesTextAsJsonOnlyWhenNothingIsLost) {
         {"K%C3%BCche", "K\xc3\xbc"
                        "che"},
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         const Json::Value got = Param(Get("p=" + std::string(each.text)), "p", "default");
         EXPECT_EQ(got, each.expected) << each.text;
         EXPECT_EQ(got.type() == Json::stringValue, each.expected.type() == Json::stringValue) << each.text;

@@ -97,11 +97,10 @@ class Playback : public testing::Test {
 };
 
 TEST_F(Playback, ObeysWhatThePlayersModeCan) {
-    struct Case {
+    const struct {
         const char* player;
         int set_rate, get_position, pause;  // the statuses
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"PlayMjpegEvent&timestamp=7", 200, 409, 409},
         {"PlayMjpegEvent&timestamp=7&interval=5", 409, 409, 409},
         {"PlayMjpegEvent&timestamp=7&changerate=0", 200, 409, 409},
@@ -112,7 +111,7 @@ TEST_F(Playback, ObeysWhatThePlayersModeCan) {
         {"PlayMjpegEventNoFrameId&timestamp=7&changerate=1&playrate=4", 200, 409, 200},
         {"PlayMjpegEventNoFrameId&timestamp=7&changerate=1&interval=0", 409, 409, 409},
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         Player player = Play(each.player);
         EXPECT_EQ(Ask("SetRate", "timestamp=7&rate=2").status, each.set_rate) << each.player;
         EXPECT_EQ(Ask("GetPosition", "timestamp=7").status, each.get_position) << each.player;
@@ -127,12 +126,11 @@ TEST_F(Playback, ObeysWhatThePlayersModeCan) {
 
 TEST_F(Playback, RefusesBadInput) {
     Player player = Play("PlayMjpegEventNoFrameId&changerate=1&timestamp=7");
-    struct Case {
+    const struct {
         const char* method;
         const char* form;
         int status;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"SetRate", "timestamp=7&rate=0", 400},
         {"SetRate", "timestamp=7&rate=-1", 400},
         {"SetRate", "timestamp=7&rate=-9", 400},
@@ -151,7 +149,7 @@ TEST_F(Playback, RefusesBadInput) {
         {"Rewind", "timestamp=7", 404},
         {"Stop", "timestamp=-7", 400},
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         EXPECT_EQ(Ask(each.method, each.form).status, each.status) << each.method << ' ' << each.form;
     }
     for (const char* method : {"SetRate&rate=2", "Pause&on=true", "CheckOwner", "Stop"}) {
@@ -227,12 +225,14 @@ TEST_F(Playback, HandsOverToTheNewerPlayer) {
 TEST_F(Playback, LeavesAloneWhomNobodyHasReplaced) {
     Player player = Play("PlayMjpegEvent&timestamp=1");
     // A stranger's number, no number, no file: nobody has taken over.
-    for (const char* content : {"1", "x", ""}) {
+    for (const char* content : {"x", "", "1"}) {
         std::ofstream(PlayerFile()) << content;
         EXPECT_EQ(Ask("CheckOwner", "timestamp=1").Json()["data"]["owner"], true) << content;
         EXPECT_EQ(player.Tell("checks"), 0) << content;
     }
-    std::filesystem::remove(PlayerFile());
+    EXPECT_EQ(host_.Ask("api=Test&version=1&method=Nothing", session_.secret).status, 502);
+    ASSERT_TRUE(Eventually(2s, [&] { return host_.RequestProcesses() == 1; }));
+    EXPECT_TRUE(std::filesystem::remove(PlayerFile())) << "swept behind a process that did not write it";
     EXPECT_EQ(Ask("CheckOwner", "timestamp=1").status, 200);
     EXPECT_EQ(player.Tell("checks"), 0);
 }

@@ -1,34 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A request's process as the module sees it: a caller, and a store with recordings.
+// A request's process as the module sees it: a caller, a store, and signals of the host.
 #pragma once
 
-#include <filesystem>
-#include <memory>
-#include <string>
+#include <chrono>
+#include <csignal>
 
 #include <gtest/gtest.h>
+#include <sys/time.h>
 
-#include "platform/recording/jpegextractor.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/store/users.h"
 #include "test/support/folder.h"
-#include "test/support/footage/footage.h"
 
 namespace lookhaven::binding {
-
-constexpr std::int64_t kNoon = 1772366400;
 
 class Binding : public testing::Test {
   protected:
     Binding() {
-        base::Installation::CreateFolders(folder_);
-        home_ = std::make_unique<base::Installation>(folder_);
-        store::Store::Migrate(home_->StoreUrl());
-        footage_ = std::make_unique<test::Footage>(home_->StoreUrl(), folder_);
-        for (const char* name : {"admin", "guest"}) {
-            store::Users(footage_->Records()).Add(name, "long enough", store::Privilege::kViewer);
-        }
+        store::Users users(records_);
+        users.Add("admin", "long enough", store::Privilege::kOwner);
+        users.Add("guest", "long enough", store::Privilege::kViewer);
         Call(1);
     }
     ~Binding() override { Call(0); }
@@ -36,20 +28,32 @@ class Binding : public testing::Test {
     void Call(unsigned int user) const {
         RequestContext& context = RequestContext::Current();
         context.CloseRecords();
-        context.Begin(*home_, nullptr);
+        context.Begin(home_, nullptr);
         context.SetCaller(user);
         context.RestrictByPrivData({});
     }
-    static std::string Picture(JpegExtractor& extractor, int index, int size = 100) {
-        std::string buffer(static_cast<std::size_t>(size), '\0');
-        const int result = extractor.ReadFrame(index, reinterpret_cast<unsigned char*>(buffer.data()), size);
-        return result == 0 ? buffer.substr(0, static_cast<std::size_t>(size)) : "none";
-    }
-    std::filesystem::path Path(const char* name) const { return footage_->Mount() / name; }
 
-    test::TemporaryFolder folder_;
-    std::unique_ptr<base::Installation> home_;
-    std::unique_ptr<test::Footage> footage_;
+    const test::TemporaryFolder folder_;
+    const base::Installation home_{(base::Installation::CreateFolders(folder_), folder_)};
+    store::Store records_{(store::Store::Migrate(home_.StoreUrl()), store::Store::Open(home_.StoreUrl()))};
+};
+
+// Sends this process a signal every so often, as a host does.
+class Ticks {
+  public:
+    explicit Ticks(std::chrono::microseconds period) {
+        struct sigaction action {};
+        action.sa_handler = [](int) {};
+        sigaction(SIGALRM, &action, nullptr);
+        Set(period);
+    }
+    ~Ticks() { Set(std::chrono::microseconds(0)); }
+
+  private:
+    static void Set(std::chrono::microseconds period) {
+        const itimerval timer{{0, period.count()}, {0, period.count()}};
+        setitimer(ITIMER_REAL, &timer, nullptr);
+    }
 };
 
 }  // namespace lookhaven::binding

@@ -4,7 +4,6 @@
 #include <filesystem>
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "platform/admission/host.h"
 #include "platform/admission/pairauth.h"
@@ -14,13 +13,11 @@
 #include "platform/emap/emap.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/pair_token.h"
-#include "standalone/binding/request_context.h"
 #include "standalone/emap/pictures.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
-#include "standalone/store/users.h"
-#include "test/support/folder.h"
+#include "test/component/binding/binding_fixture.h"
 
 namespace lookhaven::binding {
 namespace {
@@ -34,12 +31,10 @@ const std::string kSecret(64, 'c');
 const std::string kCertificate = "-----BEGIN CERTIFICATE-----\nAA==\n-----END CERTIFICATE-----\n";
 
 // A managing host with a server "Annex" (1), whose camera 1 is camera 2 here, and a map (1).
-class EmapBinding : public testing::Test {
+class EmapBinding : public Binding {
   protected:
     EmapBinding() {
         store::Users users(records_);
-        users.Add("admin", "long enough", store::Privilege::kOwner);
-        users.Add("guest", "long enough", store::Privilege::kViewer);
         users.DenyItem(2, DeniableItem::kEmap, 1);
         users.DenyItem(2, DeniableItem::kDoor, 4);
         users.DenyItem(2, DeniableItem::kIoModule, 5);
@@ -48,24 +43,8 @@ class EmapBinding : public testing::Test {
         servers_.PutCamera(
             {.server_id = 1, .id_on_server = 1, .name = "Yard", .video_type = base::Codec::kH264, .audio = true});
         emaps_.Add({.name = "Ground floor"});
-        Call(1);
-    }
-    ~EmapBinding() override { Call(0); }
-
-    static store::Store MakeStore(const std::string& url) {
-        store::Store::Migrate(url);
-        return store::Store::Open(url);
-    }
-    void Call(unsigned int user) const {
-        RequestContext& context = RequestContext::Current();
-        context.CloseRecords();
-        context.Begin(home_, nullptr);
-        context.SetCaller(user);
     }
 
-    const test::TemporaryFolder folder_;
-    const base::Installation home_{(base::Installation::CreateFolders(folder_), folder_)};
-    store::Store records_ = MakeStore(home_.StoreUrl());
     store::Emaps emaps_{records_};
     store::Devices devices_{records_};
     store::RecordingServers servers_{records_};

@@ -3,43 +3,22 @@
 // What the platform does for players: the pace, and the pictures of recordings that are whole, broken or still growing.
 #include <array>
 #include <chrono>
-#include <csignal>
 #include <fstream>
 #include <functional>
 #include <thread>
-
-#include <sys/time.h>
 
 #include "platform/recording/event.h"
 #include "platform/recording/pacing.h"
 #include "standalone/archive/layout.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
-#include "test/component/binding/binding_fixture.h"
+#include "test/component/binding/footage_fixture.h"
 
 namespace lookhaven::binding {
 namespace {
 
 using namespace std::chrono_literals;
 using base::MonotonicMicros;
-
-// Sends this process a signal every so often, as a host does.
-class Ticks {
-  public:
-    explicit Ticks(std::chrono::microseconds period) {
-        struct sigaction action {};
-        action.sa_handler = [](int) {};
-        sigaction(SIGALRM, &action, nullptr);
-        Set(period);
-    }
-    ~Ticks() { Set(0us); }
-
-  private:
-    static void Set(std::chrono::microseconds period) {
-        const itimerval timer{{0, period.count()}, {0, period.count()}};
-        setitimer(ITIMER_REAL, &timer, nullptr);
-    }
-};
 
 std::int64_t MillisOf(const std::function<void()>& act) {
     const std::int64_t began = MonotonicMicros();
@@ -96,9 +75,9 @@ TEST(DelayTimer, TakesANewPeriodAtOnceAndBoundsIt) {
     EXPECT_LT(MillisOf([&] { timer.Delay(); }), 2000) << "a signal ends a wait of 10 s";
 }
 
-TEST_F(Binding, ReadsPicturesByNumberAndTime) {
+TEST_F(FootageBinding, ReadsPicturesByNumberAndTime) {
     Event event;
-    ASSERT_EQ(event.Load(footage_->Record(1, kNoon, 3), 0, 0, 0), 0);
+    ASSERT_EQ(event.Load(footage_.Record(1, kNoon, 3), 0, 0, 0), 0);
     ASSERT_TRUE(event.IsSaved() && IsFileExist(event.GetFullPath()));
     JpegExtractor extractor;
     EXPECT_EQ(Picture(extractor, 0), "none") << "nothing is open";
@@ -122,16 +101,16 @@ TEST_F(Binding, ReadsPicturesByNumberAndTime) {
     EXPECT_EQ(Picture(extractor, 12), "picture 12") << "plays on while it is being deleted";
 }
 
-TEST_F(Binding, NeverSpinsOnOnePicture) {
+TEST_F(FootageBinding, NeverSpinsOnOnePicture) {
     JpegExtractor extractor;
-    ASSERT_EQ(extractor.Init(footage_->FileOf(footage_->Record(1, kNoon, 1))), 0);
+    ASSERT_EQ(extractor.Init(footage_.FileOf(footage_.Record(1, kNoon, 1))), 0);
     EXPECT_LT(MillisOf([&] {
                   Picture(extractor, 4);
                   EXPECT_EQ(Picture(extractor, 4), "picture 4");
               }),
               150)
         << "the first repeat belongs to ordinary playback";
-    std::ofstream(footage_->FileOf(1)) << "gone";
+    std::ofstream(footage_.FileOf(1)) << "gone";
     EXPECT_GE(MillisOf([&] {
                   for (int i = 0; i < 3; ++i) {
                       EXPECT_EQ(Picture(extractor, 4), "picture 4") << "from memory";
@@ -142,7 +121,7 @@ TEST_F(Binding, NeverSpinsOnOnePicture) {
     EXPECT_LT(MillisOf([&] { EXPECT_EQ(Picture(extractor, 4), "picture 4"); }), 150) << "a signal ends the wait";
 }
 
-TEST_F(Binding, FollowsARecordingThatGrows) {
+TEST_F(FootageBinding, FollowsARecordingThatGrows) {
     const std::int64_t now_ms = base::WallMillis();
     test::WrittenRecording recording(Path("grows.mkv"), now_ms, 100);
     recording.Append(10);
@@ -169,8 +148,8 @@ TEST_F(Binding, FollowsARecordingThatGrows) {
     EXPECT_LT(MillisOf([&] { EXPECT_EQ(Picture(extractor, 15), "none"); }), 1000) << "it has ended";
 }
 
-TEST_F(Binding, RefusesBrokenRecordings) {
-    const std::string whole = footage_->FileOf(footage_->Record(1, kNoon, 2));
+TEST_F(FootageBinding, RefusesBrokenRecordings) {
+    const std::string whole = footage_.FileOf(footage_.Record(1, kNoon, 2));
     const auto damage = [&](const char* name, const std::function<void(std::string & index)>& act) {
         std::string index = base::ReadFile(archive::IndexPathOf(whole));
         act(index);

@@ -13,31 +13,30 @@
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
-#include "test/component/binding/binding_fixture.h"
+#include "test/component/binding/footage_fixture.h"
 
 namespace lookhaven::binding {
 namespace {
 
-TEST_F(Binding, RefusesWhatTheCallerMayNotPlayBack) {
-    const int event = footage_->Record(2, kNoon, 3);
-    const int alert = footage_->Mark(REC_EVENT_ALERT, 2, kNoon, 2, "door", event);
-    const int sale = footage_->Mark(REC_EVENT_POS, 2, kNoon, 2, "1 coffee", event);
-    store::Users(footage_->Records()).Deny(2, 2, {store::CameraAccess::kPlayback});
-    const int group = store::Groups(footage_->Records()).Add({0, "all", {1, 2}});
-    struct Case {
+TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
+    const int event = footage_.Record(2, kNoon, 3);
+    const int alert = footage_.Mark(REC_EVENT_ALERT, 2, kNoon, 2, "door", event);
+    const int sale = footage_.Mark(REC_EVENT_POS, 2, kNoon, 2, "1 coffee", event);
+    store::Users(records_).Deny(2, 2, {store::CameraAccess::kPlayback});
+    const int group = store::Groups(records_).Add({0, "all", {1, 2}});
+    const struct {
         const char* who;
         unsigned int caller;
         std::set<int> renounced;
         bool sees;
-    };
-    const Case cases[] = {{"one who may", 1, {}, true},
-                          {"one who may not", 2, {}, false},
-                          {"nobody", 0, {}, false},
-                          {"a peer", PAIR_AUTH_UID, {}, true},
-                          {"a peer narrowed", PAIR_AUTH_UID, {2}, false},
-                          {"one who renounces it", 1, {2}, false},
-                          {"an account that is gone", 77, {}, false}};
-    for (const Case& each : cases) {
+    } cases[] = {{"one who may", 1, {}, true},
+                 {"one who may not", 2, {}, false},
+                 {"nobody", 0, {}, false},
+                 {"a peer", PAIR_AUTH_UID, {}, true},
+                 {"a peer narrowed", PAIR_AUTH_UID, {2}, false},
+                 {"one who renounces it", 1, {2}, false},
+                 {"an account that is gone", 77, {}, false}};
+    for (const auto& each : cases) {
         Call(each.caller);
         RequestContext::Current().RestrictByPrivData(each.renounced);
         const int refused = each.sees ? 0 : -1;
@@ -78,9 +77,9 @@ TEST_F(Binding, RefusesWhatTheCallerMayNotPlayBack) {
     EXPECT_EQ(Picture(extractor, 5), "picture 5") << "the footage of its span";
 }
 
-TEST_F(Binding, DeniesGroups) {
-    const int group = store::Groups(footage_->Records()).Add({0, "yard", {3}});
-    store::Users(footage_->Records()).DenyGroup(2, group, {store::CameraAccess::kPlayback});
+TEST_F(FootageBinding, DeniesGroups) {
+    const int group = store::Groups(records_).Add({0, "yard", {3}});
+    store::Users(records_).DenyGroup(2, group, {store::CameraAccess::kPlayback});
     EXPECT_EQ(PrivProfileGetByUid(2).GetInaPrivPerCamGrpIdSet(CAM_PRIV_PLAYBACK), std::set<int>{group});
     EXPECT_EQ(PrivProfileGetByUid(2).GetInaPrivPerCamGrpIdSet(CAM_PRIV_AUDIO), std::set<int>{});
     EXPECT_EQ(PrivProfileGetByUid(PAIR_AUTH_UID).GetInaPrivPerCamGrpIdSet(CAM_PRIV_PLAYBACK), std::set<int>{});
@@ -90,18 +89,11 @@ TEST_F(Binding, DeniesGroups) {
     EXPECT_EQ(GetCamLocalList(false, std::to_string(group), "", false, false).size(), 1U);
 }
 
-TEST_F(Binding, KnowsTheCamerasOfAMount) {
-    footage_->Record(3, kNoon, 1);
-    store::Cameras(footage_->Records()).Remove(3);
-    const int other = [&] {
-        store::Mount mount;
-        mount.name = "Other";
-        mount.path = "/nowhere";
-        return store::Mounts(footage_->Records()).Add(mount);
-    }();
-    store::RecordingPlan plan;
-    plan.mount_id = other;
-    store::RecordingPlans(footage_->Records()).Set(2, plan);
+TEST_F(FootageBinding, KnowsTheCamerasOfAMount) {
+    footage_.Record(3, kNoon, 1);
+    store::Cameras(records_).Remove(3);
+    const int other = store::Mounts(records_).Add({.name = "Other", .path = "/nowhere"});
+    store::RecordingPlans(records_).Set(2, {.mount_id = other});
     const auto ids = [](int mount, const char* denied, bool with_deleted) {
         std::set<int> found;
         for (const auto& [id, camera] : GetCamMountMap(mount, denied, with_deleted)) {
@@ -110,7 +102,7 @@ TEST_F(Binding, KnowsTheCamerasOfAMount) {
         }
         return found;
     };
-    const int first = footage_->MountId();
+    const int first = footage_.MountId();
     EXPECT_EQ(ids(0, "", true), (std::set<int>{1, 2, 3}));
     EXPECT_EQ(ids(0, "", false), (std::set<int>{1, 2}));
     EXPECT_EQ(ids(0, "1,3", true), (std::set<int>{2}));
@@ -122,23 +114,22 @@ TEST_F(Binding, KnowsTheCamerasOfAMount) {
     EXPECT_EQ(camera.GetStoragePath(), "/nowhere/2");
 }
 
-TEST_F(Binding, FindsEventsAndTheirSeconds) {
-    const int event = footage_->Record(1, kNoon, 5);
-    footage_->Record(1, kNoon + 100, 5);
-    struct Case {
+TEST_F(FootageBinding, FindsEventsAndTheirSeconds) {
+    const int event = footage_.Record(1, kNoon, 5);
+    footage_.Record(1, kNoon + 100, 5);
+    const struct {
         int mount, reason, state, offset;
         std::int64_t begin, end;
         std::size_t found;
-    };
-    const Case cases[] = {{0, 0, 0, 0, 0, kNoon * 2, 2},
-                          {0, 0, 2, 0, kNoon + 4, kNoon + 5, 1},
-                          {0, 0, 0, 0, kNoon + 5, kNoon + 100, 0},
-                          {99, 0, 0, 0, 0, kNoon * 2, 0},
-                          {0, REC_METHOD_ALARM, 0, 0, 0, kNoon * 2, 0},
-                          {0, REC_METHOD_CONTINUOUS, 0, 1, 0, kNoon * 2, 1},
-                          {0, 0, 0, 0, kNoon * 2, 0, 0},
-                          {0, 0, 0, -5, -2'147'483'648, 2'147'483'647, 2}};
-    for (const Case& each : cases) {
+    } cases[] = {{0, 0, 0, 0, 0, kNoon * 2, 2},
+                 {0, 0, 2, 0, kNoon + 4, kNoon + 5, 1},
+                 {0, 0, 0, 0, kNoon + 5, kNoon + 100, 0},
+                 {99, 0, 0, 0, 0, kNoon * 2, 0},
+                 {0, REC_METHOD_ALARM, 0, 0, 0, kNoon * 2, 0},
+                 {0, REC_METHOD_CONTINUOUS, 0, 1, 0, kNoon * 2, 1},
+                 {0, 0, 0, 0, kNoon * 2, 0, 0},
+                 {0, 0, 0, -5, -2'147'483'648, 2'147'483'647, 2}};
+    for (const auto& each : cases) {
         EventFilterParam filter;
         filter.m_CamIds = {1};
         filter.m_MountId = each.mount;
@@ -156,7 +147,7 @@ TEST_F(Binding, FindsEventsAndTheirSeconds) {
     EXPECT_EQ(EventListGetAll(events, fresh), 0);
     EXPECT_TRUE(events.empty()) << "no camera was named";
     Event found;
-    ASSERT_EQ(found.Load(event, footage_->MountId(), 0, 0), 0);
+    ASSERT_EQ(found.Load(event, footage_.MountId(), 0, 0), 0);
     EXPECT_EQ(found.GetStartTm(), kNoon);
     EXPECT_EQ(found.GetEndTm(), kNoon + 5);
     EXPECT_EQ(found.GetFrameCount(), 50);
@@ -167,11 +158,8 @@ TEST_F(Binding, FindsEventsAndTheirSeconds) {
     auto* bytes = reinterpret_cast<unsigned char*>(seconds.data());
     ASSERT_EQ(ReadRecLog(camera.GetStoragePath(), kNoon - 3, 12, bytes), 0);
     EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\1\0\0\0\0", 12));
-    store::Mount former;
-    former.name = "Former";
-    former.path = (folder_ / "former").string();
     std::filesystem::create_directories(folder_ / "former" / "1");
-    store::Mounts(footage_->Records()).Add(former);
+    store::Mounts(records_).Add({.name = "Former", .path = (folder_ / "former").string()});
     archive::WriteRecordingLog(folder_ / "former" / "1", kNoon + 4, kNoon + 7, 3);
     ASSERT_EQ(ReadRecLog(camera.GetStoragePath(), kNoon - 3, 12, bytes), 0);
     EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\3\3\3\0\0", 12)) << "what it recorded elsewhere before";
@@ -184,26 +172,25 @@ TEST_F(Binding, FindsEventsAndTheirSeconds) {
 }
 
 TEST(FillRecLogMap, GivesRunsOfSteps) {
-    struct Case {
+    const struct {
         std::string recorded, covered;
         int interval;
         const char* map;
-    };
-    const Case cases[] = {{"000111000", "000000000", 1, R"({"interval":1,"runs":[[0,3],[1,3],[0,3]]})"},
-                          {"000111000", "000011000", 3, R"({"interval":3,"runs":[[0,1],[2,1],[0,1]]})"},
-                          {"00000000", "00000001", 5, R"({"interval":5,"runs":[[0,1],[2,1]]})"},
-                          {"1111", "0000", 100, R"({"interval":100,"runs":[[1,1]]})"},
-                          {"10", "00", 0, R"({"interval":1,"runs":[[1,1],[0,1]]})"},
-                          {"10", "00", -2'147'483'647 - 1, R"({"interval":1,"runs":[[1,1],[0,1]]})"},
-                          {"10", "00", 2'147'483'647, R"({"interval":2147483647,"runs":[[1,1]]})"},
-                          {"", "", 5, R"({"interval":5,"runs":[]})"}};
+    } cases[] = {{"000111000", "000000000", 1, R"({"interval":1,"runs":[[0,3],[1,3],[0,3]]})"},
+                 {"000111000", "000011000", 3, R"({"interval":3,"runs":[[0,1],[2,1],[0,1]]})"},
+                 {"00000000", "00000001", 5, R"({"interval":5,"runs":[[0,1],[2,1]]})"},
+                 {"1111", "0000", 100, R"({"interval":100,"runs":[[1,1]]})"},
+                 {"10", "00", 0, R"({"interval":1,"runs":[[1,1],[0,1]]})"},
+                 {"10", "00", -2'147'483'647 - 1, R"({"interval":1,"runs":[[1,1],[0,1]]})"},
+                 {"10", "00", 2'147'483'647, R"({"interval":2147483647,"runs":[[1,1]]})"},
+                 {"", "", 5, R"({"interval":5,"runs":[]})"}};
     const auto bytes = [](std::string digits) {
         for (char& digit : digits) {
             digit = digit == '0' ? '\0' : '\xff';
         }
         return digits;
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         const std::string recorded = bytes(each.recorded);
         const std::string covered = bytes(each.covered);
         Json::Value map;
@@ -217,21 +204,20 @@ TEST(FillRecLogMap, GivesRunsOfSteps) {
 }
 
 TEST(String2IntList, KeepsNumbersInOrder) {
-    struct Case {
+    const struct {
         std::string text, delimiter;
         std::list<int> numbers;
-    };
-    const Case cases[] = {{"", ",", {}},
-                          {",,", ",", {}},
-                          {"1,,x,2", ",", {1, 2}},
-                          {" 3 ,\t4", ",", {3, 4}},
-                          {"5,5,-7,0", ",", {5, 5, -7, 0}},
-                          {"1x,0x2,+3,1.5,99999999999,6", ",", {6}},
-                          {"1--2-3", "--", {1}},
-                          {"1--2--3", "--", {1, 2, 3}},
-                          {"12", "", {12}},
-                          {std::string("1\0,2", 4), ",", {2}}};
-    for (const Case& each : cases) {
+    } cases[] = {{"", ",", {}},
+                 {",,", ",", {}},
+                 {"1,,x,2", ",", {1, 2}},
+                 {" 3 ,\t4", ",", {3, 4}},
+                 {"5,5,-7,0", ",", {5, 5, -7, 0}},
+                 {"1x,0x2,+3,1.5,99999999999,6", ",", {6}},
+                 {"1--2-3", "--", {1}},
+                 {"1--2--3", "--", {1, 2, 3}},
+                 {"12", "", {12}},
+                 {std::string("1\0,2", 4), ",", {2}}};
+    for (const auto& each : cases) {
         EXPECT_EQ(String2IntList(each.text, each.delimiter), each.numbers) << each.text;
     }
     std::string many;

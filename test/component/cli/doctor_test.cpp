@@ -5,7 +5,6 @@
 #include <functional>
 #include <thread>
 
-#include <sys/shm.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
@@ -41,10 +40,9 @@ class FakeHost {
                 if (!connection) {
                     return;
                 }
-                char request[512];
-                const ssize_t got = ::recv(connection.Get(), request, sizeof request, 0);
-                const std::string text(request, static_cast<std::size_t>(std::max<ssize_t>(got, 0)));
-                if (answers && text.find("api=VEXO.Auth&version=1&method=Status") != std::string::npos) {
+                std::string request(512, '\0');
+                ::recv(connection.Get(), request.data(), request.size(), 0);
+                if (answers && request.find("api=VEXO.Auth&version=1&method=Status") != std::string::npos) {
                     ::send(connection.Get(), "Status: 401", 11, MSG_NOSIGNAL);
                 }
             }
@@ -72,18 +70,15 @@ class DoctorTest : public DemoTest {
         return Run("doctor");
     }
 
-    void Sql(const std::string& statement) {
-        const std::string url = base::Installation(home_).StoreUrl();
-        store::Connection(store::StoreAddress::Parse(url)).Write([&](soci::session& sql) { sql << statement; });
+    // Causes and mends of faults.
+    std::function<void()> Sql(const std::string& statement) {
+        return [this, statement] {
+            const std::string url = base::Installation(home_).StoreUrl();
+            store::Connection(store::StoreAddress::Parse(url)).Write([&](soci::session& sql) { sql << statement; });
+        };
     }
-
-    void AddRecording(std::int64_t size_bytes) {
-        store::Event event;
-        event.camera_id = 1;
-        event.mount_id = 2;
-        event.size_bytes = size_bytes;
-        store::Store store = Open();
-        store::Events(store).AddAll(std::vector{event});
+    std::function<void()> Permissions(const char* file, int bits) {
+        return [=, this] { std::filesystem::permissions(home_ / file, std::filesystem::perms(bits)); };
     }
 
     std::unique_ptr<FakeHost> host_;
@@ -102,28 +97,29 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
         const char* remedy;
         std::function<void()> mend;
     } rows[] = {
-        {"open folder", [&] { std::filesystem::permissions(home_, std::filesystem::perms(0755)); },
-         "open to other users",
-         "chmod go=", [&] { std::filesystem::permissions(home_, std::filesystem::perms(0700)); }},
-        {"readable store", [&] { std::filesystem::permissions(home_ / "lookhaven.db", std::filesystem::perms(0644)); },
-         "lookhaven.db is open",
-         "chmod go=", [&] { std::filesystem::permissions(home_ / "lookhaven.db", std::filesystem::perms(0600)); }},
-        {"newer store", [&] { Sql("update schema_version set version = 99"); }, "newer than this program",
-         "update Lookhaven",
-         [&] { Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion())); }},
-        {"no manager", [&] { Sql("update users set privilege = 2 where name = 'admin'"); }, "no account may manage",
-         "init --admin", [&] { Sql("update users set privilege = 0 where name = 'admin'"); }},
-        {"no live source", [&] { Sql("update cameras set live_profile = 2 where id = 1"); }, "camera 1 has no source",
-         "camera set", [&] { Sql("update cameras set live_profile = 0 where id = 1"); }},
-        {"no mount", [&] { Sql("delete from mounts"); }, "no mount to record to", "lookhaven init",
+        {"open folder", Permissions("", 0755), "open to other users", "chmod go=", Permissions("", 0700)},
+        {"readable store", Permissions("lookhaven.db", 0644), "lookhaven.db is open",
+         "chmod go=", Permissions("lookhaven.db", 0600)},
+        {"newer store", Sql("update schema_version set version = 99"), "newer than this program", "update Lookhaven",
+         Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))},
+        {"no manager", Sql("update users set privilege = 2 where name = 'admin'"), "no account may manage",
+         "init --admin", Sql("update users set privilege = 0 where name = 'admin'")},
+        {"no live source", Sql("update cameras set live_profile = 2 where id = 1"), "camera 1 has no source",
+         "camera set", Sql("update cameras set live_profile = 0 where id = 1")},
+        {"no mount", Sql("delete from mounts"), "no mount to record to", "lookhaven init",
          [&] { EXPECT_EQ(Run("init").code, 0); }},
         {"mount gone", [&] { std::filesystem::rename(home_ / "recordings", home_ / "away"); }, "is not there",
          "mount its disk", [&] { std::filesystem::rename(home_ / "away", home_ / "recordings"); }},
         {"another folder", [&] { std::filesystem::remove(home_ / "recordings" / ".lookhaven-mount"); },
          "not the folder that was added", "mount set",
          [&] { EXPECT_EQ(Run("mount set 2 --path " + (home_ / "recordings").string()).code, 0); }},
-        {"above the limit", [&] { Sql("update mounts set max_bytes = 10"), AddRecording(12); }, "above its limit",
-         "raise the limit", [&] { Sql("delete from events"); }},
+        {"above the limit",
+         [&] {
+             Sql("update mounts set max_bytes = 10")();
+             store::Store store = Open();
+             store::Events(store).AddAll(std::vector<store::Event>{{.camera_id = 1, .mount_id = 2, .size_bytes = 12}});
+         },
+         "above its limit", "raise the limit", Sql("delete from events")},
         {"mute host", [&] { host_.reset(), host_ = std::make_unique<FakeHost>(socket, false); }, "does not answer",
          "start the server", [&] { host_.reset(); }},
         {"no host", [&] { std::filesystem::remove(socket); }, "does not answer", "start the server",

@@ -33,23 +33,20 @@ class CliTest : public testing::Test {
   protected:
     CliTest();
 
-    // A line as in a shell, split at blanks, where '…' keeps blanks. as_nobody: as a user who owns nothing.
+    // A line as in a shell, which splits it. as_nobody: as a user who owns nothing.
     Outcome Run(const std::string& line, const std::string& input = "", bool as_nobody = false);
     // The same on a terminal, where each answer is typed at its prompt.
     Outcome RunOnTerminal(const std::string& line, const std::vector<std::string>& answers);
-    // Runs line after line. A failure answers in one sentence, and no password is ever printed.
+    // Runs line after line. A failure answers in one sentence or in JSON, and no password is ever printed.
     void Play(const std::vector<Row>& rows);
 
-    // An installation with an owner "admin" and a viewer, their passwords as below, and the demo's cameras.
+    // An installation with an owner "admin" and a viewer, and the demo's cameras.
     void SetUpDemo();
 
     store::Store Open();
 
-    static constexpr const char* kAdminPassword = "admin-s3cret";
-    static constexpr const char* kViewerPassword = "viewer-s3cret";
-
     test::TemporaryFolder folder_;
-    std::filesystem::path home_;
+    const std::filesystem::path home_ = folder_ / "home";
 };
 
 class DemoTest : public CliTest {

@@ -30,17 +30,16 @@ constexpr std::int64_t kStart = 1'772'352'900;  // 2026-03-01T08:15:00Z
 class RecordingsTest : public DemoTest {
   protected:
     int AddRow(store::Events& events, int camera, std::int64_t start_s, int reason, bool recording) {
-        store::Event event;
-        event.id = events.NextId();
-        event.camera_id = camera;
-        event.mount_id = 1;
-        event.start_s = start_s;
-        event.end_s = start_s + 300;
-        event.reason = reason;
-        event.recording = recording;
-        event.path = archive::PathOf({camera, start_s, event.id, archive::FileKind::kRecording});
-        events.Begin(event);
-        return event.id;
+        const int id = events.NextId();
+        events.Begin({.id = id,
+                      .camera_id = camera,
+                      .mount_id = 1,
+                      .start_s = start_s,
+                      .end_s = start_s + 300,
+                      .recording = recording,
+                      .reason = reason,
+                      .path = archive::PathOf({camera, start_s, id, archive::FileKind::kRecording})});
+        return id;
     }
 };
 
@@ -216,9 +215,7 @@ TEST_F(RecordingsTest, GeneratedEventsFillASpanAndAreRemovedTogether) {
           {"demo events --count 1000 --days 10 --json", 0, "\"marks_added\" : 20"},
           {"mount list", 0, "1       0 B"},
           {"event export 500 /dev/null", 66, "no footage"}});
-    store::EventFilter filter;
-    filter.camera_ids = {1, 2, 3, 4};
-    const std::vector<store::Event> all = events.List(filter);
+    const std::vector<store::Event> all = events.List({.camera_ids = {1, 2, 3, 4}});
     ASSERT_EQ(all.size(), 1001U);
     const std::int64_t last = all.back().start_s;
     EXPECT_EQ(all.front().id, kept);

@@ -54,16 +54,14 @@ TEST(Scgi, TakesARequestHoweverItIsCut) {
     }
 }
 
-struct Case {
-    const char* name;
-    std::string bytes;
-    State expected;
-};
-
 TEST(Scgi, RefusesWhatIsNotARequest) {
     const std::string kStart = Head("CONTENT_LENGTH|0|SCGI|1|");
     const std::string kBig(ScgiParser::kMaxHeadBytes, 'x');
-    const Case cases[] = {
+    const struct {
+        const char* name;
+        std::string bytes;
+        State expected;
+    } cases[] = {
         {"least request", Netstring(kStart), State::kComplete},
         {"largest head", Netstring(kStart + "A|" + kBig.substr(kStart.size() + 3) + "|"), State::kComplete},
         {"head too large", std::to_string(kBig.size() + 1) + ":", State::kMalformed},
@@ -94,7 +92,7 @@ TEST(Scgi, RefusesWhatIsNotARequest) {
         {"name without value", Netstring(kStart + "A|"), State::kMalformed},
         {"bytes behind the body", Netstring(kStart) + "x", State::kMalformed},
     };
-    for (const Case& each : cases) {
+    for (const auto& each : cases) {
         for (const std::size_t step : {std::size_t{1}, each.bytes.size()}) {
             ScgiParser parser;
             EXPECT_EQ(FeedAll(parser, each.bytes, step), each.expected) << each.name << ", in steps of " << step;

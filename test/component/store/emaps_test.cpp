@@ -5,9 +5,7 @@
 
 #include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
-#include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
-#include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
 namespace lookhaven::store {
@@ -169,22 +167,6 @@ TEST_P(EmapTest, AStateIsOneThatTheDeviceHasAndKnowsSinceWhen) {
     EXPECT_THROW(devices_.Report({EmapItemType::kDoor, 9, -1, "open", 1}), NotFound);
     devices_.Remove(EmapItemType::kDoor, door);
     EXPECT_THAT(devices_.States(), SizeIs(1));
-}
-
-TEST_P(EmapTest, WhatIsDeniedEndsTheSessionAndStaysWithinItsKind) {
-    Users users(store_);
-    Sessions sessions(store_);
-    const int bob = users.Add("bob", "correct horse", Privilege::kViewer).id;
-    const std::string session = sessions.Create(bob, 100).secret;
-    users.DenyItem(bob, DeniableItem::kDoor, 3);
-    users.DenyItem(bob, DeniableItem::kDoor, 3);
-    users.DenyItem(bob, DeniableItem::kEmap, 4);
-    EXPECT_FALSE(sessions.FindBySecret(session, 101));
-    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kDoor), ElementsAre(3));
-    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kIoModule), IsEmpty());
-    users.AllowItem(bob, DeniableItem::kDoor, 3);
-    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kDoor), IsEmpty());
-    EXPECT_THROW(users.DenyItem(99, DeniableItem::kDoor, 3), NotFound);
 }
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {

@@ -14,26 +14,12 @@ namespace lookhaven::store {
 namespace {
 
 using testing::ElementsAre;
+using testing::Field;
 using testing::IsEmpty;
 
 class PlaceTest : public StoreTest {
   protected:
-    int AddMount(const std::string& name, const std::string& path) {
-        Mount mount;
-        mount.name = name;
-        mount.path = path;
-        return mounts_.Add(mount);
-    }
-
-    std::vector<int> DefaultMounts() {
-        std::vector<int> ids;
-        for (const Mount& mount : mounts_.List()) {
-            if (mount.is_default) {
-                ids.push_back(mount.id);
-            }
-        }
-        return ids;
-    }
+    int AddMount(const std::string& name, const std::string& path) { return mounts_.Add({.name = name, .path = path}); }
 
     Mounts mounts_{store_};
     Groups groups_{store_};
@@ -44,13 +30,13 @@ class PlaceTest : public StoreTest {
 TEST_P(PlaceTest, OneMountIsTheDefaultAndNoneLiesInAnother) {
     EXPECT_FALSE(mounts_.FindForPlan(0));
     const int first = AddMount("first", "/srv/a");
-    EXPECT_THAT(DefaultMounts(), ElementsAre(first));
+    EXPECT_THAT(mounts_.List(), ElementsAre(Field(&Mount::is_default, true)));
     Mount second = *mounts_.Find(AddMount("second", "/srv/ab"));
     second.is_default = true;
     second.max_bytes = 5'000'000'000;
     second.max_age_s = 30 * 86400;
     mounts_.Update(second);
-    EXPECT_THAT(DefaultMounts(), ElementsAre(second.id));
+    EXPECT_THAT(mounts_.List(), ElementsAre(Field(&Mount::is_default, false), Field(&Mount::is_default, true)));
     second.is_default = false;
     mounts_.Update(second);
     EXPECT_EQ(mounts_.FindForPlan(0)->id, second.id) << "a default is replaced, not taken away";
@@ -80,12 +66,8 @@ TEST_P(PlaceTest, AMountInUseIsNotForgottenByMistake) {
     EXPECT_THROW(mounts_.Remove(other, true), InvalidRecord) << "a camera records there";
     plans_.Set(camera, {});
     Events events(store_);
-    Event event;
-    event.camera_id = camera;
-    event.mount_id = other;
-    events.AddAll(std::vector{event});
-    event.mount_id = normal;
-    events.AddAll(std::vector{event});
+    events.AddAll(
+        std::vector<Event>{{.camera_id = camera, .mount_id = other}, {.camera_id = camera, .mount_id = normal}});
     Marks marks(store_);
     const Mark mark = marks.Add(MarkKind::kPos, camera, 100, 0, "");
     marks.Save(mark.id, other, "a");

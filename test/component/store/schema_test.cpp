@@ -16,12 +16,9 @@
 namespace lookhaven::store {
 namespace {
 
-using testing::AllOf;
-using testing::Each;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
-using testing::Not;
 using testing::ThrowsMessage;
 
 TEST_P(EmptyStore, IsRefusedUntilItIsSetUpAndKeepsItsDataWhenSetUpAgain) {
@@ -77,21 +74,7 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
 
 TEST_P(EmptyStore, IsSetUpOnceByMany) {
     std::atomic<int> steps = 0;
-    std::vector<std::string> failures(6);
-    std::vector<std::thread> threads;
-    for (std::string& failure : failures) {
-        threads.emplace_back([&] {
-            try {
-                steps += Store::Migrate(url_);
-            } catch (const std::exception& error) {
-                failure = error.what();
-            }
-        });
-    }
-    for (std::thread& thread : threads) {
-        thread.join();
-    }
-    EXPECT_THAT(failures, Each(""));
+    InParallel(6, [&] { steps += Store::Migrate(url_); });
     EXPECT_EQ(steps, Store::SchemaVersion());
 }
 

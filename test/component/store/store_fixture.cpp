@@ -27,24 +27,21 @@ void EmptyStore::Force(const std::string& statement) {
     Connection(StoreAddress::Parse(url_)).Write([&](soci::session& sql) { sql << statement; });
 }
 
-void StoreTest::InParallel(int connections, const std::function<void(Store&)>& work) {
-    std::latch start(connections);
-    std::vector<std::string> failures(static_cast<std::size_t>(connections));
-    std::vector<std::thread> threads;
+void EmptyStore::InParallel(int threads, const std::function<void()>& work) {
+    std::latch start(threads);
+    std::vector<std::string> failures(static_cast<std::size_t>(threads));
+    std::vector<std::jthread> running;
     for (std::string& failure : failures) {
-        threads.emplace_back([&] {
+        running.emplace_back([&] {
             try {
                 start.arrive_and_wait();
-                Store store = Store::Open(url_);
-                work(store);
+                work();
             } catch (const std::exception& error) {
                 failure = error.what();
             }
         });
     }
-    for (std::thread& thread : threads) {
-        thread.join();
-    }
+    running.clear();
     EXPECT_THAT(failures, testing::Each(""));
 }
 

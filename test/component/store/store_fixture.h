@@ -25,6 +25,8 @@ class EmptyStore : public testing::TestWithParam<Engine> {
     // Reads and writes past the records' classes.
     std::string Ask(const std::string& query);
     void Force(const std::string& statement);
+    // Runs the work in that many threads at once; a failure in any of them fails the test.
+    static void InParallel(int threads, const std::function<void()>& work);
 
     test::TemporaryFolder folder_{"lookhaven store"};  // a path with a space
     std::string url_;
@@ -43,8 +45,13 @@ class StoreTest : public EmptyStore {
 
     int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
 
-    // Runs the work on that many connections at once; a failure in any of them fails the test.
-    void InParallel(int connections, const std::function<void(Store&)>& work);
+    // The same on a connection each.
+    void InParallel(int connections, const std::function<void(Store&)>& work) {
+        EmptyStore::InParallel(connections, [&] {
+            Store store = Store::Open(url_);
+            work(store);
+        });
+    }
 
     Store store_;
 };

@@ -89,14 +89,6 @@ Json::Value Caller(const APIRequest& request) {
     return caller;
 }
 
-// As a player does that is then killed.
-void DieWithPlayerFile(const std::string& session) {
-    std::FILE* file = std::fopen(("/tmp/player_src.pid." + session).c_str(), "w");
-    std::fprintf(file, "%d", getpid());
-    std::fclose(file);
-    raise(SIGKILL);
-}
-
 void Play(APIRequest* request, APIResponse*) {
     PlayTest(*request);
 }
@@ -140,8 +132,6 @@ void Serve(APIRequest* request, APIResponse* response) {
         response->SetSuccess(much.back());
     } else if (method == "Crash") {
         std::abort();
-    } else if (method == "DieWithPlayerFile") {
-        DieWithPlayerFile(request->GetSessionID());
     } else if (method == "Surroundings") {
         response->SetSuccess(Surroundings());
     } else if (method == "Caller") {
@@ -171,7 +161,6 @@ const Row kTable[] = {{"Test", 1, "Nothing", Serve},
                       {"Test", 1, "Hang", Serve},
                       {"Test", 1, "Devour", Serve},
                       {"Test", 1, "Crash", Serve},
-                      {"Test", 1, "DieWithPlayerFile", Serve},
                       {"Test", 1, "Surroundings", Serve},
                       {"Test", 1, "Caller", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Serve},
