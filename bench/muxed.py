@@ -24,11 +24,7 @@ def print_canvas_delays(build_folder):
         address = f"https://localhost:{server.tls_port}/"
         with Visit("muxed.mjs", address, LOOKHAVEN_WATCH_MS=str(WATCH_SECONDS * 1000)) as visit:
             for name, step in ("sound off", "watched"), ("sound on", "heard"):
-                if step != "watched":
-                    visit.go_on()
-                seen = visit.next()
-                if seen["step"] != step:
-                    raise RuntimeError(seen["step"])
+                seen = visit.see(step)
                 delays = sorted(delay for delay in seen["delaysMs"] if delay is not None)
                 print(
                     f"| {name} | {seen['moments'] / seen['seconds']:.1f} | {delays[len(delays) // 2]:.0f} "

@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# What the web API answers to good and bad requests, through the web server and straight at the host's socket.
+# What the web API answers to good and bad requests through the web server.
 import pathlib
 import socket
 import time
@@ -20,82 +20,43 @@ def play(camera, **parameters):
     return call(LIVE, "Play", camera=camera, **parameters)
 
 
+def picture(**parameters):
+    return call("VEXO.Picture", "Get", **parameters)
+
+
 LOGIN = call("VEXO.Auth", "Login")
 STATUS = call("VEXO.Auth", "Status")
 FORM = {"Content-Type": "application/x-www-form-urlencoded"}
-JSON = {"Content-Type": "application/json"}
 
 # What is asked; the account; further arguments of the request; the HTTP status and the code in the answer.
 BAD_REQUESTS = [
-    ("no api", {"version": 1}, "admin", {}, 404, 404),
-    ("unknown api", call("VEXO.Nothing", "Play"), "admin", {}, 404, 404),
-    ("unknown version", call(PLAYER, "LoadCamera", 99), "admin", {}, 404, 404),
-    ("version of the wrong type", call(PLAYER, "LoadCamera", "one"), "admin", {}, 400, 400),
     ("unknown method", call(PLAYER, "Dance"), "admin", {}, 404, 404),
-    ("path in the api", call("../../etc/passwd", "x"), "admin", {}, 404, 404),
     ("no session", call(PLAYER, "LoadCamera"), None, {}, 401, 401),
     ("no session, live", play(1), None, {}, 401, 401),
-    ("no session, snapshot", play(1, snapshot=1), None, {}, 401, 401),
-    ("cookie of nobody", call(PLAYER, "LoadCamera"), None, {"headers": {"Cookie": "id=" + "0" * 64}}, 401, 401),
-    ("cookie of 2 KiB", call(PLAYER, "LoadCamera"), None, {"headers": {"Cookie": "id=" + "a" * 2048}}, 401, 401),
-    ("cookie of odd bytes", call(PLAYER, "LoadCamera"), None, {"headers": {"Cookie": "id=%00;;=;id"}}, 401, 401),
     ("cookie too large", call(PLAYER, "LoadCamera"), None, {"headers": {"Cookie": "id=" + "a" * 9000}}, 400, 400),
     ("query too large", "api=" + "a" * 9000, None, {}, 400, 400),
-    ("method PUT", STATUS, "admin", {"method": "PUT", "body": ""}, 405, 405),
     ("body too large", LOGIN, None, {"body": b"a" * (1 << 20) + b"b", "headers": FORM}, 413, 413),
-    ("wrong password", LOGIN, None, {"form": {"account": "admin", "password": "wrong"}}, 401, 401),
-    ("unknown account", LOGIN, None, {"form": {"account": "nobody", "password": "wrong"}}, 401, 401),
     ("log-in without a word", LOGIN, None, {"form": {}}, 401, 401),
-    ("log-in by GET", {**LOGIN, "account": "admin", "password": "x"}, None, {}, 405, 405),
-    ("log-out by GET", call("VEXO.Auth", "Logout"), "admin", {}, 405, 405),
-    ("broken JSON body", STATUS, "admin", {"body": '{"a":', "headers": JSON}, 400, 400),
-    ("JSON body that is no object", STATUS, "admin", {"body": "[1]", "headers": JSON}, 400, 400),
-    ("deep JSON body", STATUS, "admin", {"body": '{"a":' * 20000, "headers": JSON}, 400, 400),
     ("camera 0", play(0), "admin", {}, 502, 502),
     ("camera -1", play(-1), "admin", {}, 502, 502),
     ("camera 2^31", play(2**31), "admin", {}, 400, 400),
-    ("camera 10^30", play(10**30), "admin", {}, 400, 400),
     ("camera of letters", play("abc"), "admin", {}, 400, 400),
-    ("camera of an object", play('{"a":1}'), "admin", {}, 400, 400),
     ("camera that is not there", play(4711), "admin", {}, 502, 502),
     ("snapshot of letters", play(1, snapshot="abc"), "admin", {}, 400, 400),
     ("snapshot of H.264", play(2, snapshot=1), "admin", {}, 502, 502),
     ("e-map that is not there", play(99, itemType=1), "admin", {}, 502, 502),
     ("relay of an unknown camera", call("VEXO.Relay", "Play", server=1, camera=1), "admin", {}, 404, 404),
-    ("forbidden camera", play(2), "viewer", {}, 504, 504),
-    ("forbidden camera, snapshot", play(2, snapshot=1), "viewer", {}, 502, 502),
     ("search without a span", call(PLAYER, "EnumEvent"), "admin", {}, 200, 401),
     ("search in a group that is not there", call(PLAYER, "SearchAvaiDate", camGrpId=99), "admin", {}, 200, 400),
     ("number of an event that is a text", call(PLAYER, "PlayMjpegEvent", eventid="abc"), "admin", {}, 400, 400),
+    ("picture, no session", picture(camera=2), None, {}, 401, 401),
+    ("picture, not allowed", picture(camera=2), "viewer", {}, 403, 403),
+    ("picture of no camera", picture(), "admin", {}, 400, 400),
+    ("picture of letters", picture(camera="abc"), "admin", {}, 400, 400),
+    ("picture of an unknown camera", picture(camera=4711), "admin", {}, 404, 404),
+    ("picture of a disabled camera", picture(camera=3), "admin", {}, 504, 504),
+    ("picture, unknown method", call("VEXO.Picture", "Dance", camera=2), "admin", {}, 404, 404),
     ("steering without a player", call("VEXO.Playback", "GetPosition", timestamp=1), "admin", {}, 404, 404),
-    ("steering by GET", call("VEXO.Playback", "Stop", timestamp=1), "admin", {}, 405, 405),
-]
-
-
-def netstring(head, body=b""):
-    text = b"".join(name + b"\0" + value + b"\0" for name, value in head)
-    return b"%d:%s,%s" % (len(text), text, body)
-
-
-GOOD_HEAD = [(b"CONTENT_LENGTH", b"0"), (b"SCGI", b"1"), (b"REQUEST_METHOD", b"GET"), (b"QUERY_STRING", b"")]
-# Bytes at the host's socket, and whether the sender stops sending then. A clean answer or a closed connection, always.
-BAD_BYTES = [
-    ("nothing", b""),
-    ("no netstring", b"GET / HTTP/1.1\r\n\r\n"),
-    ("length of letters", b"abc:"),
-    ("endless length", b"9" * 100),
-    ("length too large", b"8193:" + b"a" * 8193 + b","),
-    ("huge length", b"99999999999999999999:"),
-    ("negative length", b"-1:"),
-    ("no comma", netstring(GOOD_HEAD)[:-1] + b"x"),
-    ("half a head", netstring(GOOD_HEAD)[:20]),
-    ("no content length", netstring(GOOD_HEAD[1:])),
-    ("content length of letters", netstring([(b"CONTENT_LENGTH", b"abc")] + GOOD_HEAD[1:])),
-    ("negative content length", netstring([(b"CONTENT_LENGTH", b"-1")] + GOOD_HEAD[1:])),
-    ("content length too large", netstring([(b"CONTENT_LENGTH", b"1048577")] + GOOD_HEAD[1:])),
-    ("body shorter than said", netstring([(b"CONTENT_LENGTH", b"10")] + GOOD_HEAD[1:], b"abc")),
-    ("name without value", b"15:CONTENT_LENGTH\0,"),
-    ("empty head", b"0:,"),
 ]
 
 
@@ -111,24 +72,14 @@ class ApiTest(unittest.TestCase):
                 self.assertEqual((answer.status, answer.json.get("success"), answer.code), (status, False, code), answer.body)
         self.assertEqual(self.server.request(STATUS, "admin").status, 200)
 
-    def test_bad_bytes_at_the_socket_get_400_or_the_end(self):
-        for name, sent in BAD_BYTES:
-            with self.subTest(name), socket.socket(socket.AF_UNIX) as connection:
-                connection.settimeout(15)
-                connection.connect(str(self.server.home / "run/webapi.sock"))
-                connection.sendall(sent)
-                connection.shutdown(socket.SHUT_WR)
-                got = connection.makefile("rb").read()
-                self.assertTrue(got == b"" or got.startswith(b"Status: 400"), got)
-        self.assertEqual(self.server.request(STATUS, "admin").status, 200)
-
     def test_viewer_never_hears_of_camera_2(self):
         data = self.server.request(call(PLAYER, "LoadCamera", camera=2), "viewer").json["data"]
         self.assertNotIn(2, [camera["id"] for camera in data["camera"]])
         self.assertEqual(data["CamNum"], data["EnableCamNum"] + 1, "the disabled camera counts, the forbidden one does not")
         for parameters in ({}, {"snapshot": 1}, {"profileType": 0}, {"profileType": 1}, {"isFromPlugin": 1}):
             answer = self.server.request(play(2, **parameters), "viewer")
-            self.assertEqual(answer.status, 502 if "snapshot" in parameters else 504, parameters)
+            status = 502 if "snapshot" in parameters else 504
+            self.assertEqual((answer.status, answer.json.get("success"), answer.code), (status, False, status), parameters)
             self.assertNotIn(b"Parking", answer.body)
 
     def test_admin_sees_the_demo_cameras(self):
@@ -148,18 +99,6 @@ class ApiTest(unittest.TestCase):
                 answer = waiting.result()
             self.assertEqual((answer.status, answer.code), (504, 504), answer.body)
             self.assertLess(time.monotonic() - began, 8)
-
-    def test_session_ends_with_log_out_and_takes_its_streams_along(self):
-        cookie = self.server.login("viewer")
-        headers = {"Cookie": f"id={cookie}"}
-        connection, response = self.server.open(play(1), headers=headers)
-        response.readline()
-        self.assertEqual(self.server.request(call("VEXO.Auth", "Logout"), headers=headers, form={}).status, 200)
-        self.assertEqual(self.server.request(STATUS, headers=headers).status, 401)
-        connection.sock and connection.sock.settimeout(2)
-        while response.read1(1 << 16):
-            pass
-        connection.close()
 
     def test_log_ins_are_throttled_by_address(self):
         with Installation() as server:

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit writes a
-// line of JSON after each step and waits for a line before the next, so that the caller can look at the server in between.
+// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits for a
+// line before each step and writes a line of JSON after it, so that the caller can look at the server in between.
 import { createInterface } from "node:readline";
 import { chromium } from "playwright-core";
 
@@ -24,6 +24,7 @@ export async function visit(body) {
     ]),
   });
   try {
+    await lines.next();
     const context = await browser.newContext({ ignoreHTTPSErrors: true, viewport: { width: 1280, height: 800 } });
     const page = await context.newPage();
     const complaints = [];

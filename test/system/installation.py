@@ -196,6 +196,11 @@ class Installation:
         connection.request(method or ("GET" if body is None else "POST"), f"/webapi?{query}", body, headers)
         return connection, connection.getresponse()
 
+    def answers(self):
+        """The web API serves who is logged in."""
+        with contextlib.suppress(OSError):
+            return self.request({"api": "VEXO.Auth", "version": 1, "method": "Status"}, "admin").status == 200
+
     def login(self, account, password=None):
         answer = self.request(
             {"api": "VEXO.Auth", "version": 1, "method": "Login"},
@@ -222,14 +227,12 @@ class Installation:
 
 
 class Parts:
-    """Reads a multipart answer part by part; bytes_per_second slows the reading down."""
+    """Reads a multipart answer part by part."""
 
-    def __init__(self, connection, response, bytes_per_second=None):
+    def __init__(self, connection, response):
         self.response = response
         self._connection = connection
-        self._pace = bytes_per_second
-        self._began = time.monotonic()
-        self._read = 0
+        self.slow_down(None)
 
     def __enter__(self):
         return self

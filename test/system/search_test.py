@@ -46,11 +46,6 @@ class SearchTest(unittest.TestCase):
             found = self.days(cameralists="1", start=start, day_count=6)
             self.assertEqual(found[:4], expected[:4])
             self.assertIn(1, found)
-        self.assertEqual(self.days(cameralists="1", start=now - 200 * 86400, day_count=100), [0] * 100)
-        self.assertEqual(len(self.days(cameralists="1", start=now, day_count=2**31 - 1)), 128)
-        self.assertIsNone(self.days(cameralists="1", start=now, day_count=-(2**31)))
-        for nobody in ("", ",,", "99", "3", "x,0,-1"):
-            self.assertEqual(self.days(cameralists=nobody, start=now - 86400, day_count=3), [0, 0, 0], nobody)
 
     def test_finds_what_was_recorded_and_nothing_else(self):
         to = int(time.time()) - 3600  # what is being recorded now is no part of it
@@ -83,10 +78,6 @@ class SearchTest(unittest.TestCase):
         self.assertEqual(
             [entry["camera_id"] for entry in self.ask("EnumEvent", mount_id=mount["id"], **span)["camera"]],
             [camera for camera in (1, 2, 3, 4) if camera in mount["camera"]])
-        self.assertEqual(self.ask("EnumEvent", mount_id=99, **span)["camera"], [])
-        for method in ("EnumEvent", "SearchAvaiDate"):
-            answer = self.server.request({**PLAYER, "method": method, "camGrpId": 99, **span}, "admin")
-            self.assertEqual(answer.code, 400)
 
     def test_a_forbidden_camera_is_nowhere(self):
         now = int(time.time())
@@ -97,22 +88,6 @@ class SearchTest(unittest.TestCase):
         self.assertEqual([entry["camera_id"] for entry in self.ask("EnumEvent", "viewer", **group)["camera"]], [1])
         today = now // 86400 * 86400
         self.assertEqual(self.days(account="viewer", cameralists="2", start=today - 86400, day_count=3), [0, 0, 0])
-
-    def test_bad_spans_are_answered_at_once(self):
-        rows = [
-            {"from": 5, "to": 5}, {"from": 6, "to": 5}, {"from": -(2**31), "to": 2**31 - 1}, {"from": 0, "to": 33 * 86400},
-        ]
-        for span in rows:
-            with self.subTest(span):
-                answer = self.server.request({**PLAYER, "method": "EnumEvent", "cameralists": "1", **span}, "admin", timeout=5)
-                self.assertEqual(answer.code, 401)
-        now = int(time.time())
-        for interval in (0, -5, -(2**31)):
-            answer = self.ask("EnumEvent", **{"cameralists": "1", "from": now - 60, "to": now, "interval": interval})
-            self.assertEqual(answer["camera"][0]["event_map"]["interval"], 1)
-        many = {"cameralists": ",".join(["x", "", "1"] * 30_000), "from": now - 60, "to": now}
-        answer = self.server.request({**PLAYER, "method": "EnumEvent"}, "admin", form=many)
-        self.assertEqual(len(answer.json["data"]["camera"]), 4096)
 
 
 class RecordedNowTest(unittest.TestCase):

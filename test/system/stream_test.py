@@ -12,7 +12,7 @@ import time
 import unittest
 from concurrent.futures import ThreadPoolExecutor
 
-from installation import LIVE, Installation, Parts, descendants, wait_until
+from installation import LIVE, Installation, descendants, wait_until
 
 PLAY = f"/webapi?api={LIVE}&version=1&method=Play&camera="
 
@@ -70,7 +70,6 @@ class StreamTest(unittest.TestCase):
                 list(pool.map(cut, plans))
             time.sleep(2)
             after = leftovers(self.server)
-            one.slow_down(None)
             self.assertEqual(before["requests"], after["requests"])
             self.assertEqual(before["segments"], after["segments"])
             # nginx keeps no connection of ours; a few descriptors of slack would hide a leak of one per thousand only.
@@ -129,16 +128,7 @@ class StreamTest(unittest.TestCase):
             os.kill(host, signal.SIGKILL)
             wait_until(lambda: not any(pathlib.Path(f"/proc/{pid}").exists() for pid in requests), 2, "requests end too")
             self.assertRaises(EOFError, lambda: [stream.next() for _ in range(1000)])
-        def answers():
-            answer = self.server.request("api=VEXO.Auth&version=1&method=Status", "admin")
-            return answer.status == 200
-        wait_until(answers, 10, "the host answers again")
-
-    def test_streams_start_fast_and_stop_when_nobody_watches(self):
-        with self.server.live(1, profileType=1) as stream:
-            stream.next()
-            running = self.server.requests()
-        wait_until(lambda: len(self.server.requests()) < len(running), 2, "the request ends with its viewer")
+        wait_until(self.server.answers, 10, "the host answers again")
 
 
 if __name__ == "__main__":

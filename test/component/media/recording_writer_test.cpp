@@ -11,13 +11,13 @@
 #include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <sys/resource.h>
-#include <sys/wait.h>
 
 #include "standalone/archive/recording_reader.h"
 #include "standalone/archive/repair.h"
 #include "standalone/base/clock.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
+#include "test/support/process.h"
 
 namespace lookhaven::test {
 namespace {
@@ -72,7 +72,7 @@ struct Written {
     std::atomic<std::int64_t> returned_us{0};  // when the last Write that has returned was called
 };
 
-[[noreturn]] void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int length, Written& written) {
+void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int length, Written& written) {
     RecordingWriter writer(path, clip.format, base::WallMillis(), 1);
     for (int i = 0; i < length; ++i) {
         Packet packet = clip.At(static_cast<std::size_t>(i) % clip.packets.size());
@@ -87,7 +87,6 @@ struct Written {
     }
     writer.Close();
     ::pause();
-    ::_exit(0);
 }
 
 // Whatever was captured half a second before a Write that returned is on the disk, however slow the machine is.
@@ -106,11 +105,8 @@ TEST(RecordingWriter, LosesHalfASecondAtMostWhenKilledAnywhere) {
         std::vector<std::pair<std::int64_t, std::pair<pid_t, int>>> kills;
         for (int i = 0; i < kAtOnce; ++i) {
             const int length = 30 + static_cast<int>(random() % 400);
-            const pid_t pid = ::fork();
-            ASSERT_GE(pid, 0);
-            if (pid == 0) {
-                RecordUntilKilled(*clips[i % 2], folder / (std::to_string(i) + ".mkv"), length, written[i]);
-            }
+            const pid_t pid = InChild(
+                [&] { RecordUntilKilled(*clips[i % 2], folder / (std::to_string(i) + ".mkv"), length, written[i]); });
             kills.push_back(
                 {base::MonotonicMicros() + 20'000 + static_cast<std::int64_t>(random() % 2'000'000), {pid, i}});
         }
@@ -119,9 +115,7 @@ TEST(RecordingWriter, LosesHalfASecondAtMostWhenKilledAnywhere) {
             std::this_thread::sleep_for(
                 std::chrono::microseconds(std::max<std::int64_t>(0, time_us - base::MonotonicMicros())));
             ::kill(child.first, SIGKILL);
-            int status = 0;
-            ASSERT_EQ(::waitpid(child.first, &status, 0), child.first);
-            ASSERT_TRUE(WIFSIGNALED(status)) << "the child failed by itself";
+            ASSERT_TRUE(WIFSIGNALED(WaitFor(child.first))) << "the child failed by itself";
             const Written& seen = written[child.second];
             const auto old = std::count_if(seen.times_us, seen.times_us + seen.count,
                                            [&](std::int64_t us) { return us < seen.returned_us - 500'000; });

@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Sources: secrets in texts, clocks that jump, what a probe finds, and stop requests.
+// Sources: secrets in texts, clocks that jump, and what a probe finds.
 #include <cstdlib>
-#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -76,18 +75,6 @@ TEST(Probe, IgnoresSoundWhoseNameDoesNotDetermineItsForm) {
         EXPECT_EQ(result.video.codec, Codec::kH264);
         EXPECT_EQ(result.audio ? std::optional(result.audio->codec) : std::nullopt, row.codec);
     }
-}
-
-// Far below the time after which a stalled source fails by itself, and far above what a busy machine needs.
-TEST(Source, AStopRequestEndsAWaitForAStalledCamera) {
-    MjpegCamera camera;
-    camera.SetMood(MjpegCamera::Mood::kStall);
-    std::stop_source stop;
-    const auto source = OpenSource(CameraKinds(), camera.Url(), {{}, std::chrono::seconds(100)}, stop.get_token());
-    std::jthread stopper([&] { stop.request_stop(); });
-    const auto begin = std::chrono::steady_clock::now();
-    EXPECT_THROW(source->Next(), SourceError);
-    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(30));
 }
 
 }  // namespace

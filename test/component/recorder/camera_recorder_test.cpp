@@ -11,6 +11,7 @@
 #include "standalone/maintenance/mount_folder.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
+#include "test/support/wait.h"
 
 namespace lookhaven::recorder {
 namespace {
@@ -38,11 +39,7 @@ class CameraRecorderTest : public testing::Test {
     // Until the recorder has numbers for events.
     void OpenStore() {
         store::Store::Migrate(StoreUrl());
-        for (int tries = 0; tries < 500 && !rows_.HasId(); ++tries) {
-            rows_.Refresh(4);
-            std::this_thread::sleep_for(std::chrono::milliseconds(10));
-        }
-        ASSERT_TRUE(rows_.HasId());
+        ASSERT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return rows_.Refresh(4), rows_.HasId(); }));
     }
 
     void Pass(double seconds, bool with_pictures = true) {

@@ -133,6 +133,7 @@ void RecorderTest::MakeStore() const {
 }
 
 int RecorderTest::AddCamera(const std::string& source, const std::optional<store::Credentials>& credentials) const {
+    MakeStore();
     store::Store store = store::Store::Open(installation_->StoreUrl());
     store::Cameras cameras(store);
     store::Camera camera;

@@ -81,6 +81,7 @@ class RecorderTest : public testing::Test {
     ~RecorderTest() override;
 
     void MakeStore() const;
+    // Makes the store where there is none yet.
     int AddCamera(const std::string& source, const std::optional<store::Credentials>& credentials = {}) const;
     void ChangeCamera(int id, const std::function<void(store::Camera&)>& change) const;
     Child StartRecorder(const std::string& no_data_limit_s = "1") const;

@@ -19,7 +19,6 @@ using std::chrono::seconds;
 constexpr const char* kSmallPattern = "test:mjpeg?size=160x120&fps=25";
 
 TEST_F(RecorderTest, MotionJpegComesThroughByteByByte) {
-    MakeStore();
     MjpegCamera plain;
     MjpegCamera without_lengths;
     without_lengths.SetMood(MjpegCamera::Mood::kNoLengths);
@@ -43,7 +42,6 @@ TEST_F(RecorderTest, MotionJpegComesThroughByteByByte) {
 }
 
 TEST_F(RecorderTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
-    MakeStore();
     MjpegCamera camera;
     Viewer viewer(*installation_, AddCamera(camera.Url()));
     const Child recorder = StartRecorder();
@@ -81,7 +79,6 @@ TEST_F(RecorderTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
 }
 
 TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
-    MakeStore();
     MjpegCamera page;
     page.SetMood(MjpegCamera::Mood::kPage);
     Viewer good(*installation_, AddCamera(kSmallPattern));
@@ -113,7 +110,6 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
 }
 
 TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
-    MakeStore();
     const int camera = AddCamera(kSmallPattern);
     const Child recorder = StartRecorder();
     ASSERT_TRUE(Eventually([&] { return LogLines("started") > 0; }));
@@ -133,7 +129,6 @@ TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
 }
 
 TEST_F(RecorderTest, ChangesOfACameraTouchThatCameraAlone) {
-    MakeStore();
     const int changed = AddCamera(kSmallPattern);
     const int other = AddCamera(kSmallPattern);
     const Child recorder = StartRecorder();
@@ -157,12 +152,10 @@ TEST_F(RecorderTest, WaitsForTheStore) {
     const std::int64_t failed_us = base::MonotonicMicros();
     ASSERT_TRUE(Eventually([&] { return base::MonotonicMicros() > failed_us + 2'500'000; }));
     EXPECT_EQ(LogLines("cannot read the cameras"), 1u) << "a line for each attempt";
-    MakeStore();
     Viewer(*installation_, AddCamera(kSmallPattern)).Next();
 }
 
 TEST_F(RecorderTest, EndsInOrder) {
-    MakeStore();
     MjpegCamera stalled;
     stalled.SetMood(MjpegCamera::Mood::kStall);
     Viewer live(*installation_, AddCamera("test:h264?size=160x120&audio=aac"));
@@ -180,7 +173,6 @@ TEST_F(RecorderTest, EndsInOrder) {
 }
 
 TEST_F(RecorderTest, SuccessorOfAKilledRecorderGoesOnInItsRings) {
-    MakeStore();
     const int camera = AddCamera("test:h264?size=160x120&audio=aac");
     Viewer viewer(*installation_, camera);
     Viewer listener(*installation_, camera, base::Medium::kAudio);
@@ -199,7 +191,6 @@ TEST_F(RecorderTest, SuccessorOfAKilledRecorderGoesOnInItsRings) {
 }
 
 TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {
-    MakeStore();
     Viewer viewer(*installation_, AddCamera(kSmallPattern));
     const Child first = StartRecorder();
     viewer.Next();
@@ -212,7 +203,6 @@ TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {
 }
 
 TEST_F(RecorderTest, PatternDecodesWithSound) {
-    MakeStore();
     const int camera = AddCamera("test:h264?size=320x240&gop=10&audio=aac");
     const Child recorder = StartRecorder();
     Viewer viewer(*installation_, camera);
@@ -228,17 +218,6 @@ TEST_F(RecorderTest, PatternDecodesWithSound) {
         EXPECT_GE(block.timestamp_us, first_us - 500'000);
         EXPECT_LE(block.timestamp_us, base::MonotonicMicros());
     }
-}
-
-TEST_F(RecorderTest, SilentCameraHasAnEmptyRingOfSound) {
-    MakeStore();
-    const int camera = AddCamera("test:h264?size=160x120");
-    const Child recorder = StartRecorder();
-    Viewer(*installation_, camera).Next();
-    EXPECT_EQ(Segments(), 2u);
-    Viewer listener(*installation_, camera, base::Medium::kAudio);
-    EXPECT_FALSE(listener.HasPicture());
-    EXPECT_NE(listener.Ring(), nullptr);
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
 #include "test/support/footage/archive_folder.h"
+#include "test/support/wait.h"
 
 namespace lookhaven::recorder {
 namespace {
@@ -28,14 +29,11 @@ TEST(RecordingSupervisor, MaintainsTheMountsBesideOneThatFails) {
         id = store::Mounts(store).Add(mount);
     }
     RecordingSupervisor supervisor(installation, std::chrono::seconds(1));
-    for (int tries = 0; tries < 3000 && !maintenance::MountFolder::Open(home / "disk", id); ++tries) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    EXPECT_TRUE(maintenance::MountFolder::Open(home / "disk", id)) << "it was not given its marker";
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] {
+        return maintenance::MountFolder::Open(home / "disk", id).has_value();
+    })) << "it was not given its marker";
     supervisor.RequestStop();
-    while (!supervisor.HasEnded()) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
 }
 
 }  // namespace

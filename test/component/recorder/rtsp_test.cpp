@@ -39,7 +39,6 @@ class RtspTest : public RecorderTest {
 };
 
 TEST_F(RtspTest, CameraComesBackAfterEveryTroubleAndNothingIsLeftOver) {
-    MakeStore();
     std::optional<Child> rtsp_camera(StartCamera());
     const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + "/live");
     const Child recorder = StartRecorder();
@@ -118,7 +117,6 @@ TEST_F(RtspTest, EveryCodecComesThroughAndDecodes) {
 }
 
 TEST_F(RtspTest, PictureOfAnotherSizeGoesOnInARingOfItsOwnAndTheSoundStays) {
-    MakeStore();
     const Child rtsp_camera = StartCamera();
     const Child recorder = StartRecorder("5");
     const int camera = AddCamera("rtsp://127.0.0.1:" + std::to_string(port_) + "/live");

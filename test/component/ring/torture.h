@@ -14,6 +14,8 @@
 
 namespace lookhaven::ring {
 
+constexpr std::uint64_t kMinLaps = 20;
+
 // What all writers and readers of a run found; in shared memory where they are processes.
 struct Findings {
     std::atomic<std::uint64_t> written{0};
@@ -21,6 +23,19 @@ struct Findings {
     std::atomic<std::uint64_t> verified{0};
     std::atomic<std::uint64_t> torn{0};
     std::atomic<std::uint64_t> out_of_order{0};
+    std::atomic<std::uint64_t> laps{0};         // what the reader would have read next had left the ring
+    std::atomic<std::uint64_t> undecodable{0};  // it went on at a frame that builds on others
+
+    void Expect(std::uint64_t min_verified) const {
+        std::cout << written << " frames written, " << dropped << " dropped, " << verified << " verified, " << laps
+                  << " laps\n";
+        EXPECT_EQ(torn, 0U);
+        EXPECT_EQ(out_of_order, 0U);
+        EXPECT_GE(laps, kMinLaps);
+        EXPECT_EQ(undecodable, 0U);
+        EXPECT_GE(verified, min_verified);
+        EXPECT_EQ(dropped, 0U) << "readers that are gone keep space";
+    }
 };
 
 // The environment's LOOKHAVEN_TORTURE_SEED, to repeat a run, else a new one; printed.
@@ -55,6 +70,9 @@ class TortureReader {
         const Entry* entry = wants_every_frame_ ? ReadNext(ring_, last_, &position_) : nullptr;
         if (entry == nullptr) {
             entry = ReadLatest(ring_, last_, &position_, 5);
+        } else if (entry->Count() != count_ + 1) {
+            findings_.laps += count_ != 0 ? 1 : 0;
+            findings_.undecodable += (entry->flags & kKeyFrame) == 0 ? 1 : 0;
         }
         if (entry != nullptr) {
             findings_.out_of_order += entry->Count() <= count_ ? 1 : 0;

@@ -50,7 +50,8 @@ TEST_F(TortureTest, ThreadsNeverSeeATornFrame) {
     }
     TortureWriter source(writer, seed, findings);
     const std::int64_t begin = base::MonotonicMicros();
-    for (std::int64_t run = 0; run < kMinRunMicros || (findings.verified < kMinVerified && run < kMaxRunMicros);
+    const auto has_enough = [&] { return findings.verified >= kMinVerified && findings.laps >= kMinLaps; };
+    for (std::int64_t run = 0; run < kMinRunMicros || (!has_enough() && run < kMaxRunMicros);
          run = base::MonotonicMicros() - begin) {
         source.WriteOnce(6'000);
         if (findings.written % 16 == 0) {
@@ -61,12 +62,7 @@ TEST_F(TortureTest, ThreadsNeverSeeATornFrame) {
     for (std::thread& thread : threads) {
         thread.join();
     }
-    std::cout << findings.written << " frames written, " << findings.dropped << " dropped, " << findings.verified
-              << " verified\n";
-    EXPECT_EQ(findings.torn, 0U);
-    EXPECT_EQ(findings.out_of_order, 0U);
-    EXPECT_GE(findings.verified, kMinVerified);
-    EXPECT_EQ(findings.dropped, 0U) << "dead readers keep space";
+    findings.Expect(kMinVerified);
 }
 
 }  // namespace

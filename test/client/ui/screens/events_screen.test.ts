@@ -33,13 +33,6 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
 
   const state = (page: Page, wanted: string) =>
     page.until((kind) => document.querySelector<HTMLElement>(".stage-picture")!.dataset["state"] === kind, wanted);
-  /** The number that is told and the shade that is painted. */
-  const frame = (page: Page) =>
-    page.run(() => {
-      const told = Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame")!.textContent!)![1]) - 1;
-      const canvas = document.querySelector<HTMLCanvasElement>(".stage-picture canvas")!;
-      return { told, painted: Math.round(canvas.getContext("2d")!.getImageData(9, 9, 1, 1).data[0]! / 16) };
-    });
 
   async function clickLane(page: Page, camera: number, atS: number): Promise<void> {
     const box = await page.run(() => {
@@ -52,7 +45,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     for (const type of ["mousePressed", "mouseReleased"]) await page.send("Input.dispatchMouseEvent", { type, ...where });
   }
 
-  test("calendar, timeline, picture of that time; pause, steps, rate and the way back", async () => {
+  test("calendar, timeline, picture of that time; pause, rate and the way back", async () => {
     const page = await opened("#events", 1440, 900);
     const day = new Date(noon * 1000).setHours(0, 0, 0, 0);
     await page.until((ms) => document.querySelector(`.day.has[data-day="${ms}"]`) !== null, day);
@@ -69,13 +62,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.run(() => (document.activeElement as HTMLElement).blur());
     await page.press(" ");
     await state(page, "paused");
-    const before = await frame(page);
-    expect(before.painted).toBe(before.told % 16);
-    await page.press("ArrowRight");
-    await page.until((told) => document.querySelector(".transport-frame")!.textContent!.startsWith(`frame ${told} `), before.told + 2);
-    await state(page, "paused");
-    expect(await frame(page)).toEqual({ told: before.told + 1, painted: (before.told + 1) % 16 });
-    expect(archive.streams).toEqual([]);
+    await vi.waitFor(() => expect(archive.streams).toEqual([]));
     await page.press("]");
     await page.press(" ");
     await vi.waitFor(() => expect(archive.asked.at(-1)).toMatch(/ at 2$/));
