@@ -117,7 +117,9 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
          [&] {
              Sql("update mounts set max_bytes = 10")();
              store::Store store = Open();
-             store::Events(store).AddAll(std::vector<store::Event>{{.camera_id = 1, .mount_id = 2, .size_bytes = 12}});
+             store::Event event;
+             event.camera_id = 1, event.mount_id = 2, event.size_bytes = 12;
+             store::Events(store).AddAll(std::vector{event});
          },
          "above its limit", "raise the limit", Sql("delete from events")},
         {"mute host", [&] { host_.reset(), host_ = std::make_unique<FakeHost>(socket, false); }, "does not answer",

@@ -30,15 +30,12 @@ constexpr std::int64_t kStart = 1'772'352'900;  // 2026-03-01T08:15:00Z
 class RecordingsTest : public DemoTest {
   protected:
     int AddRow(store::Events& events, int camera, std::int64_t start_s, int reason, bool recording) {
-        const int id = events.NextId();
-        events.Begin({.id = id,
-                      .camera_id = camera,
-                      .mount_id = 1,
-                      .start_s = start_s,
-                      .end_s = start_s + 300,
-                      .recording = recording,
-                      .reason = reason,
-                      .path = archive::PathOf({camera, start_s, id, archive::FileKind::kRecording})});
+        store::Event event;
+        const int id = event.id = events.NextId();
+        event.camera_id = camera, event.mount_id = 1, event.reason = reason, event.recording = recording;
+        event.start_s = start_s, event.end_s = start_s + 300;
+        event.path = archive::PathOf({camera, start_s, id, archive::FileKind::kRecording});
+        events.Begin(event);
         return id;
     }
 };

@@ -66,8 +66,12 @@ TEST_P(PlaceTest, AMountInUseIsNotForgottenByMistake) {
     EXPECT_THROW(mounts_.Remove(other, true), InvalidRecord) << "a camera records there";
     plans_.Set(camera, {});
     Events events(store_);
-    events.AddAll(
-        std::vector<Event>{{.camera_id = camera, .mount_id = other}, {.camera_id = camera, .mount_id = normal}});
+    Event event;
+    event.camera_id = camera;
+    for (const int mount : {other, normal}) {
+        event.mount_id = mount;
+        events.AddAll(std::vector{event});
+    }
     Marks marks(store_);
     const Mark mark = marks.Add(MarkKind::kPos, camera, 100, 0, "");
     marks.Save(mark.id, other, "a");
