@@ -12,13 +12,14 @@ namespace lookhaven::api {
 
 constexpr const char* kSessionCookie = "id";  // carries the session's secret
 
-// The live session of the call's cookie, noted as in use; nothing when there is none. Looks at query and headers only. Throws
-// Failure 403 for a request that another site's page made a browser send, but for a GET of the API that authenticates its
-// callers itself, which has no session then. Throws store::StoreError.
+// The live session of the call's cookie, noted as in use; nothing when there is none. Looks at query and headers only.
+// Throws Failure 403 for a request that another site's page made a browser send, but for a GET of the API that
+// authenticates its callers itself, which has no session then. Throws store::StoreError.
 std::optional<binding::Login> FindLogin(const Call& call);
 
 // Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure
-// 401 without a session, except at the API that authenticates its callers itself; 503 when max_requests of the session run already.
+// 401 without a session, except at the API that authenticates its callers itself; 503 when max_requests of the session
+// run already.
 void Admit(const Call& call, std::size_t max_requests);
 
 }  // namespace lookhaven::api

@@ -36,8 +36,8 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
     return data;
 }
 
-// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use. All
-// machines of a link share its link-local network.
+// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
+// All machines of a link share its link-local network.
 std::string NetworkOf(std::string_view address) {
     in6_addr bytes{};
     if (::inet_pton(AF_INET6, std::string(address).c_str(), &bytes) != 1 || IN6_IS_ADDR_V4MAPPED(&bytes) ||

@@ -10,9 +10,9 @@
 
 namespace lookhaven::api {
 
-// Writes the whole answer to standard output, without sound where the caller may not hear the camera. kind: nothing for a
-// recorded event. Throws Failure 404 when there is no such event, it has no footage, or the caller may not see it; 500
-// when the footage cannot be read.
+// Writes the whole answer to standard output, without sound where the caller may not hear the camera. kind: nothing for
+// a recorded event. Throws Failure 404 when there is no such event, it has no footage, or the caller may not see it;
+// 500 when the footage cannot be read.
 void Download(const Call& call, std::optional<store::MarkKind> kind, int event);
 
 }  // namespace lookhaven::api

@@ -2,8 +2,8 @@
 //
 // The APIs of the standalone platform, beside those of the loaded modules: a table each, in a file each.
 //
-// A new API has a row in FindOwnApi, a page in docs/api, and a place in the web server's list of APIs that are no log-in
-// (packaging/nginx).
+// A new API has a row in FindOwnApi, a page in docs/api, and a place in the web server's list of APIs that are no
+// log-in (packaging/nginx).
 #pragma once
 
 #include <span>

@@ -3,7 +3,8 @@
 // VEXO.Picture: one JPEG of a camera, whatever codec it sends.
 //
 // Why so        A snapshot exists for Motion JPEG only; a browser that cannot decode a camera's video should still show
-//               something. The frame is copied out of the ring before it is decoded, so that the writer need not skip it.
+//               something. The frame is copied out of the ring before it is decoded, so that the writer need not skip
+//               it.
 #include "standalone/api/own_apis.h"
 
 #include <array>

@@ -18,7 +18,8 @@ constexpr int kMinRate = -8;
 constexpr std::chrono::milliseconds kSignalPoll{2};
 constexpr std::chrono::milliseconds kSignalLimit{1'000};
 
-// The slot of the player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such player.
+// The slot of the player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such
+// player.
 control::Slot& PlayerSlot(const Call& call) {
     const std::int64_t key = call.NumberOr("timestamp", 0);
     if (key < 1) {

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Why so        The progress file holds one number, so a player that reads its rate there cannot report its position there.
-//               A player with an interval is not paced and has no rate. Only PlayMjpegEventNoFrameId can pause, and only at
-//               rate 1 or slower; a faster one is first set to rate 1.
+// Why so        The progress file holds one number, so a player that reads its rate there cannot report its position
+//               there. A player with an interval is not paced and has no rate. Only PlayMjpegEventNoFrameId can pause,
+//               and only at rate 1 or slower; a faster one is first set to rate 1.
 #include "standalone/api/player.h"
 
 #include <algorithm>

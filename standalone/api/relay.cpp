@@ -2,8 +2,9 @@
 //
 // VEXO.Relay: the live view of a recording server's camera on this host's origin.
 //
-// Why so        A browser has no session at the other server. This host checks whether the caller may see the camera, and has
-//               the web server fetch it with a token that is valid for minutes; secret and token never reach the browser.
+// Why so        A browser has no session at the other server. This host checks whether the caller may see the camera,
+//               and has the web server fetch it with a token that is valid for minutes; secret and token never reach
+//               the browser.
 #include "standalone/api/own_apis.h"
 
 #include <memory>

@@ -40,8 +40,8 @@ class RecordingReader::Segment {
 
     // Reads what was appended. Returns the entries whose place in presentation order is final, in that order.
     std::vector<std::uint32_t> Refresh() {
-        grows_ =
-            index_.IsGrowing();  // first, so that a writer that finishes in between causes another read, not a loss
+        // First, so that a writer that finishes in between causes another read, not a loss.
+        grows_ = index_.IsGrowing();
         struct stat status {};
         if (::fstat(file_.Get(), &status) != 0) {
             base::ThrowErrno("cannot read " + path_.string());

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A small file that refers to a period of footage in recordings of one camera: the footage of an alert or a POS transaction.
+// A small file that refers to a period of footage in recordings of one camera: the footage of an alert or a POS
+// transaction.
 //
 //   lookhaven span 1
 //   begin 1772352930000
@@ -18,8 +19,8 @@
 namespace lookhaven::archive {
 
 struct Span {
-    std::int64_t begin_ms =
-        0;  // wall clock; [begin, end), which may be in the future while the footage is being recorded
+    // Wall clock; [begin, end), which may be in the future while the footage is being recorded.
+    std::int64_t begin_ms = 0;
     std::int64_t end_ms = 0;
     std::vector<std::string> recordings;  // in order of time, as "<day>/<file>" below the camera's folder; may be empty
 

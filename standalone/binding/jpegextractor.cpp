@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Why so        A player that samples, and one at the end of its range, asks for the last picture again and again without a
-//               pause. So a repeated index is answered from memory, and not sooner than 200 ms after the last.
+// Why so        A player that samples, and one at the end of its range, asks for the last picture again and again
+//               without a pause. So a repeated index is answered from memory, and not sooner than 200 ms after the
+//               last.
 #include "platform/recording/jpegextractor.h"
 
 #include <algorithm>

@@ -55,8 +55,8 @@ DataEntry* Held(const ring::Entry* entry) {
     return reinterpret_cast<DataEntry*>(const_cast<ring::Entry*>(entry));
 }
 
-// The recorder has replaced the ring by a new one: its reader ends, so that the client reconnects at once instead of after
-// a time-out.
+// The recorder has replaced the ring by a new one: its reader ends, so that the client reconnects at once instead of
+// after a time-out.
 void EndReaderOfRetired(const void* stream) {
     if (ring::IsRetired(stream)) {
         std::raise(SIGTERM);

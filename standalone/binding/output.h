@@ -2,8 +2,8 @@
 //
 // Sends a request's bytes to its client: everything that standard output or a multipart answer writes.
 //
-// Why so        A player ignores the results of its writes. So the output itself ends the player when its client is gone or
-//               has stalled, and never sends anything behind a part that could not be sent whole.
+// Why so        A player ignores the results of its writes. So the output itself ends the player when its client is
+//               gone or has stalled, and never sends anything behind a part that could not be sent whole.
 // Invariants    (1) Once broken it stays broken: later writes send nothing and ferror(stdout) stays set.
 //               (2) No call blocks for longer than the limits allow.
 // Thread safety One thread.

@@ -2,8 +2,8 @@
 //
 // Privilege profiles: what a user may not see, read from the store and narrowed by what a relaying host sends along.
 //
-// Format        {"privilege": 2, "deniedCameras": [3, 7], "deniedAudio": [4]}; each may be missing. A denied camera is denied
-//               for every kind of access.
+// Format        {"privilege": 2, "deniedCameras": [3, 7], "deniedAudio": [4]}; each may be missing. A denied camera is
+//               denied for every kind of access.
 #include <algorithm>
 #include <map>
 #include <stdexcept>

@@ -31,8 +31,8 @@ LH_PLATFORM_API bool IsAlwaysText(std::string_view name);
 
 // The JSON value of a parameter's text. A text becomes a number, a truth value or null only when writing that value
 // gives the same text again ("5", but not "5,7", "007" or "1e5"), so that nothing that merely looks like a number is
-// damaged; an object or array when that holds for every value inside. Anything else is a string, and so is every text of
-// a parameter that IsAlwaysText.
+// damaged; an object or array when that holds for every value inside. Anything else is a string, and so is every text
+// of a parameter that IsAlwaysText.
 LH_PLATFORM_API Json::Value JsonFromText(std::string_view name, const std::string& text);
 
 // {"data": data, "success": true}, compact. Throws Json::Exception for what no JSON can hold.

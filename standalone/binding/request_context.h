@@ -2,8 +2,8 @@
 //
 // The one request that this process serves: its caller, what the caller was granted, its store and its output.
 //
-// Why so        The module asks for a ring or a camera without saying on whose behalf, so who the caller is must be known
-//               to the whole process. A request process serves one request, hence one context.
+// Why so        The module asks for a ring or a camera without saying on whose behalf, so who the caller is must be
+//               known to the whole process. A request process serves one request, hence one context.
 // Thread safety One thread.
 #pragma once
 
@@ -49,8 +49,8 @@ class LH_PLATFORM_API RequestContext {
 
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
-    // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever is
-    // about to send or to wait calls this; references from Records are invalid afterwards.
+    // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever
+    // is about to send or to wait calls this; references from Records are invalid afterwards.
     void CloseRecords();
 
     // The caller: a user's id, PAIR_AUTH_UID for a peer, 0 for nobody.

@@ -15,15 +15,15 @@
 
 namespace lookhaven::binding {
 
-// The cameras denied by the rights that a paired host sends with the request, for every kind of access. Throws Json::Exception
-// for another shape than the one in privilege.cpp.
+// The cameras denied by the rights that a paired host sends with the request, for every kind of access. Throws
+// Json::Exception for another shape than the one in privilege.cpp.
 LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
 
 // Likewise the cameras whose sound alone they deny.
 LH_PLATFORM_API std::set<int> SoundDeniedBy(const Json::Value& priv_data);
 
-// False for a camera that is denied to the caller or that the request's "privData" denies, and for nobody as the caller. Throws
-// store::StoreError.
+// False for a camera that is denied to the caller or that the request's "privData" denies, and for nobody as the
+// caller. Throws store::StoreError.
 LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
 
 // False for an item that is denied to the caller, and for nobody as the caller. Throws store::StoreError.

@@ -11,8 +11,8 @@ namespace lookhaven::cli {
 // kDataError when there is none.
 std::string CertificatesIn(const std::string& pem);
 
-// A host name that the certificate is valid for: its first DNS name, else its common name. Throws Failure kDataError when
-// that is no valid host name.
+// A host name that the certificate is valid for: its first DNS name, else its common name. Throws Failure kDataError
+// when that is no valid host name.
 std::string CertificateName(const std::string& pem);
 
 }  // namespace lookhaven::cli

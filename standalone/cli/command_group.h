@@ -2,8 +2,8 @@
 //
 // A group of commands, lookhaven <noun> <verb>, and the options of each.
 //
-// Why so        CLI11 fills the variables that options are bound to, and these must live until the command has run. So the
-//               commands of a group share one request, which their callbacks own. One command runs per process.
+// Why so        CLI11 fills the variables that options are bound to, and these must live until the command has run. So
+//               the commands of a group share one request, which their callbacks own. One command runs per process.
 #pragma once
 
 #include <functional>

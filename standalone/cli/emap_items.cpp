@@ -42,7 +42,8 @@ void Apply(const Request& request, EmapItem& item) {
     item.port = request.port.value_or(item.port);
 }
 
-// Reads the items, lets change edit them and saves them; it returns the answer. Fails when they were changed in between.
+// Reads the items, lets change edit them and saves them; it returns the answer. Fails when they were changed in
+// between.
 template <typename ChangeItems>
 void Edit(const Console& console, int id, ChangeItems&& change) {
     store::Store store = console.OpenStore();

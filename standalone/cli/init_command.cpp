@@ -41,8 +41,8 @@ bool AddAdmin(store::Store& store, const std::string& name) {
     return true;
 }
 
-// The folder "recordings" in the state folder, limited to half of the free space: a trial must not fill the system's disk.
-// False when there is a mount already.
+// The folder "recordings" in the state folder, limited to half of the free space: a trial must not fill the system's
+// disk. False when there is a mount already.
 bool AddDefaultMount(store::Store& store, const base::Installation& installation) {
     store::Mounts mounts(store);
     if (!mounts.List().empty()) {

@@ -11,8 +11,8 @@
 
 namespace lookhaven::cli {
 
-// Rewrites the configuration and the certificates, and reloads nginx if it runs. Throws std::system_error, and Failure for
-// a certificate without a host name.
+// Rewrites the configuration and the certificates, and reloads nginx if it runs. Throws std::system_error, and Failure
+// for a certificate without a host name.
 void WriteRelayConfig(const base::Installation& installation, const std::vector<store::RecordingServer>& servers);
 
 }  // namespace lookhaven::cli

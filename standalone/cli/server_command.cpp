@@ -2,8 +2,9 @@
 //
 // lookhaven server: hosts that show each other's cameras.
 //
-// Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one that is
-//               to show them: the host's address and certificate, its cameras, and a secret that only the two share.
+// Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one
+//               that is to show them: the host's address and certificate, its cameras, and a secret that only the two
+//               share.
 #include <iostream>
 
 #include <unistd.h>

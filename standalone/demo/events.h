@@ -10,8 +10,8 @@
 
 namespace lookhaven::demo {
 
-// Spreads count events over the store's cameras and the days before now_s, with a mark for every fifty of them. The same
-// store and arguments give the same events. Throws NotReady when there is no camera or no mount,
+// Spreads count events over the store's cameras and the days before now_s, with a mark for every fifty of them. The
+// same store and arguments give the same events. Throws NotReady when there is no camera or no mount,
 // std::invalid_argument when a camera's events would not have a second each.
 EventCounts GenerateEvents(store::Store& store, int count, int days, std::int64_t now_s);
 

@@ -20,7 +20,8 @@ struct SetupResult {
 
 bool HasViewer(store::Store& store);
 
-// Adds what is missing and leaves the rest as it is. home: the state folder. viewer_password is not used when HasViewer().
+// Adds what is missing and leaves the rest as it is. home: the state folder. viewer_password is not used when
+// HasViewer().
 SetupResult SetUp(store::Store& store, const std::filesystem::path& home, const std::string& viewer_password);
 
 }  // namespace lookhaven::demo

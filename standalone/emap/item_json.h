@@ -13,8 +13,8 @@ namespace lookhaven::emap {
 
 Json::Value ToJson(const std::vector<store::EmapItem>& items);
 
-// Members that are missing have the record's defaults. Throws store::InvalidRecord for anything but a list of objects with whole
-// numbers and a text; the numbers' bounds are the store's business.
+// Members that are missing have the record's defaults. Throws store::InvalidRecord for anything but a list of objects
+// with whole numbers and a text; the numbers' bounds are the store's business.
 std::vector<store::EmapItem> ItemsFromJson(const Json::Value& list);
 
 }  // namespace lookhaven::emap

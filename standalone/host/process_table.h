@@ -2,8 +2,8 @@
 //
 // The running request processes, and how each of them is ended.
 //
-// Why so        A module's stream tests a flag and then waits: a signal between the two goes unseen. So a process that is
-//               to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
+// Why so        A module's stream tests a flag and then waits: a signal between the two goes unseen. So a process that
+//               is to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
 //               (3) SIGUSR1 is sent to a player only while the player file names another process of its session.

@@ -30,8 +30,8 @@ struct ServerLimits {
 
 class Server {
   public:
-    // The listener is a listening stream socket. Removes what players of a killed host left in the installation's folder
-    // of progress files. Blocks all signals of the process. Throws std::system_error.
+    // The listener is a listening stream socket. Removes what players of a killed host left in the installation's
+    // folder of progress files. Blocks all signals of the process. Throws std::system_error.
     Server(const base::Installation& installation, ChildWork work, base::FileDescriptor listener,
            const ServerLimits& limits);
 

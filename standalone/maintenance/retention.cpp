@@ -59,7 +59,8 @@ class Retention {
         return excess;
     }
 
-    // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a mount.
+    // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a
+    // mount.
     bool IsExpired(const store::Event& event) const {
         return mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s;
     }

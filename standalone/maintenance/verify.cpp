@@ -33,8 +33,8 @@ struct Inspection {
     std::string problem;  // empty when they agree
     bool is_growing = false;
     bool must_rebuild_index = false;  // the index claims to be complete, and is wrong
-    bool is_damaged_inside =
-        false;  // damage in the middle; the frames after it, which the index names, may still be read
+    // Damage in the middle; the frames after it, which the index names, may still be read.
+    bool is_damaged_inside = false;
     std::int64_t frames = 0;
 };
 

@@ -42,8 +42,8 @@ struct MediaFormat {
 struct Packet {
     Medium medium = Medium::kVideo;
     std::span<const std::uint8_t> data;  // valid until the source is asked for the next packet
-    std::int64_t timestamp_us =
-        0;  // base::MonotonicMicros at capture, as closely as known; the same clock for both media
+    // base::MonotonicMicros at capture, as closely as known; the same clock for both media.
+    std::int64_t timestamp_us = 0;
     bool key_frame = false;
     const StreamFormat* format = nullptr;  // never null; lives as long as the data
 };

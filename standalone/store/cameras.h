@@ -54,8 +54,8 @@ class Cameras {
     // The store must outlive this object.
     explicit Cameras(Store& store) : connection_(store.connection()) {}
 
-    // Stores the record under a new id, which it returns; camera.id is ignored. Any kind of source may be stored: whether this
-    // program knows how to open it is for the caller to check. Throws InvalidRecord.
+    // Stores the record under a new id, which it returns; camera.id is ignored. Any kind of source may be stored:
+    // whether this program knows how to open it is for the caller to check. Throws InvalidRecord.
     int Add(const Camera& camera);
     // Replaces the record of camera.id. Throws InvalidRecord or NotFound.
     void Update(const Camera& camera);

@@ -74,8 +74,8 @@ bool Connection::HasTable(const std::string& name) {
     return FetchOne<int>(query, name).value() > 0;
 }
 
-// SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the time-out,
-// when somebody wrote in between.
+// SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the
+// time-out, when somebody wrote in between.
 Connection::Transaction::Transaction(Connection& connection, Durability durability) : session_(connection.session_) {
     const bool lazy = durability == Durability::kLazy;
     if (lazy && connection.IsSqlite()) {

@@ -18,8 +18,8 @@ namespace lookhaven::store {
 
 enum class Engine { kSqlite, kPostgresql };
 
-// Whether a power cut right after a change may lose it. A change that comes every second, and that the next one supersedes,
-// need not wait for the disk.
+// Whether a power cut right after a change may lose it. A change that comes every second, and that the next one
+// supersedes, need not wait for the disk.
 enum class Durability { kSafe, kLazy };
 
 // A store's URL, parsed.
@@ -122,8 +122,8 @@ Found Require(std::optional<Found> found, const std::string& what, int id) {
 // Throws NotFound.
 void RequireCameraRow(soci::session& sql, int id);
 
-// Throws InvalidRecord for what is no name of 1 to 64 bytes, AlreadyExists for that of another record of the table. what:
-// "an e-map", for the message. Inside Write only.
+// Throws InvalidRecord for what is no name of 1 to 64 bytes, AlreadyExists for that of another record of the table.
+// what: "an e-map", for the message. Inside Write only.
 void RequireFreeName(soci::session& sql, const std::string& table, const std::string& what, int id,
                      const std::string& name);
 

@@ -57,8 +57,8 @@ class Devices {
     // The store must outlive this object.
     explicit Devices(Store& store) : connection_(store.connection()) {}
 
-    // Stores the record under a new id of its kind, which it returns. Throws InvalidRecord; NotFound for an unknown server
-    // or paired camera; AlreadyExists when the server's device has an id here.
+    // Stores the record under a new id of its kind, which it returns. Throws InvalidRecord; NotFound for an unknown
+    // server or paired camera; AlreadyExists when the server's device has an id here.
     int Add(const Device& device);
     // Replaces name, paired camera and ports of the device. Throws InvalidRecord or NotFound.
     void Update(const Device& device);
@@ -73,8 +73,8 @@ class Devices {
     void SetCameraPorts(int camera_id, PortCounts counts);
     std::map<int, PortCounts> CameraPorts();  // by camera, only those that have any
 
-    // Throws NotFound for an unknown device or port, InvalidRecord for a state that its kind does not have. A power cut may
-    // lose a report that has returned.
+    // Throws NotFound for an unknown device or port, InvalidRecord for a state that its kind does not have. A power cut
+    // may lose a report that has returned.
     void Report(const DeviceState& state);
     std::vector<DeviceState> States();
 

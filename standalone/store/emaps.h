@@ -67,9 +67,9 @@ class Emaps {
     std::vector<EmapItem> Items(int id);
     // Whether the item's device is known.
     bool Knows(const EmapItem& item);
-    // Replaces all items and both flags of emap.id at once, and returns the new revision. Throws NotFound for an unknown
-    // map, and for a device that is neither known nor on the map already; Conflict when the map's revision is not
-    // emap.revision; InvalidRecord.
+    // Replaces all items and both flags of emap.id at once, and returns the new revision. Throws NotFound for an
+    // unknown map, and for a device that is neither known nor on the map already; Conflict when the map's revision is
+    // not emap.revision; InvalidRecord.
     int ReplaceItems(const Emap& emap, const std::vector<EmapItem>& items);
 
   private:

@@ -4,8 +4,8 @@
 //
 // Why so        The file is the record, the row is how it is found. So a row is made after its file exists and removed
 //               before the file goes: a row never points at nothing. There is no row per frame.
-// Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found by
-//                   looking at a bounded stretch of the index (camera, start), however many events there are.
+// Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found
+//                   by looking at a bounded stretch of the index (camera, start), however many events there are.
 //               (2) Ids come from one counter with those of marks and are never used twice.
 #pragma once
 
@@ -72,7 +72,8 @@ class Events {
 
     // Reserves the id of a future event; one that is not used is lost.
     int NextId();
-    // The first of that many consecutive ids; for the recorder, which must be able to begin events while the store is away.
+    // The first of that many consecutive ids; for the recorder, which must be able to begin events while the store is
+    // away.
     int NextIds(int count);
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.
@@ -88,7 +89,8 @@ class Events {
 
     // In one transaction; returns the number of rows removed. The caller then removes the files.
     int Remove(std::span<const int> ids);
-    // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call removes.
+    // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call
+    // removes.
     int RemoveDemo();
 
     std::optional<Event> Find(int id);

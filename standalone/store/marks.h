@@ -3,8 +3,8 @@
 // Marks: alarms reported by a device, transactions reported by a POS terminal. Their footage is a span of a camera's
 // recordings.
 //
-// Why so        Whoever reports one must not wait for the footage, which is complete only after the post-record time. So a
-//               mark is stored at once as pending, and the recorder, which owns the mounts, writes the span file.
+// Why so        Whoever reports one must not wait for the footage, which is complete only after the post-record time.
+//               So a mark is stored at once as pending, and the recorder, which owns the mounts, writes the span file.
 #pragma once
 
 #include <cstdint>

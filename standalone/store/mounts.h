@@ -35,9 +35,9 @@ class Mounts {
     // Replaces the record of mount.id; is_default can be set, not cleared. Throws InvalidRecord or NotFound.
     void Update(const Mount& mount);
     // Removes the record; the files stay. forget_events: removes the mount's events and saved marks first, in several
-    // transactions, so that some may be gone when it throws StoreError; call it again. Throws NotFound; InvalidRecord for the
-    // default while there are others, for a mount that a camera's plan names, and, without forget_events, for one that holds
-    // events or saved marks.
+    // transactions, so that some may be gone when it throws StoreError; call it again. Throws NotFound; InvalidRecord
+    // for the default while there are others, for a mount that a camera's plan names, and, without forget_events, for
+    // one that holds events or saved marks.
     void Remove(int id, bool forget_events);
 
     std::optional<Mount> Find(int id);

@@ -2,9 +2,9 @@
 //
 // Statements with their parameters, and rows as values. For this folder's sources.
 //
-// Why so        A record's Mapping says once which column holds which member; reading, inserting and updating follow from
-//               it. Members are bound before the statement runs: SOCI's dynamic rows give count(*) another type on each
-//               engine, and take longer.
+// Why so        A record's Mapping says once which column holds which member; reading, inserting and updating follow
+//               from it. Members are bound before the statement runs: SOCI's dynamic rows give count(*) another type on
+//               each engine, and take longer.
 //               Parameters are bound in the order of their placeholders, and a placeholder stands in a text once: the
 //               engines count one that is repeated in different ways.
 #pragma once

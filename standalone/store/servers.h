@@ -55,8 +55,8 @@ class RecordingServers {
     // connects to admits nobody here.
     std::vector<std::string> InboundPeerSecrets();
 
-    // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored. Returns
-    // the id. Throws InvalidRecord, or NotFound for an unknown server.
+    // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
+    // Returns the id. Throws InvalidRecord, or NotFound for an unknown server.
     int PutCamera(const RemoteCamera& camera);
     // Throws NotFound.
     void RemoveCamera(int id);

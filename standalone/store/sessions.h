@@ -45,8 +45,8 @@ class Sessions {
 
     // Throws NotFound for an unknown user.
     NewSession Create(int user_id, std::int64_t now_s);
-    // The same at a log-in. Throws NotFound too when the password has changed since it was checked, for that change could
-    // not end a session that did not exist yet.
+    // The same at a log-in. Throws NotFound too when the password has changed since it was checked, for that change
+    // could not end a session that did not exist yet.
     NewSession Create(const VerifiedUser& user, std::int64_t now_s);
 
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.

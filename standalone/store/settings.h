@@ -18,12 +18,12 @@ class Settings {
     explicit Settings(Store& store) : connection_(store.connection()) {}
 
     std::optional<std::string> Find(std::string_view key);
-    // key: 1 to 64 bytes; value: at most 65,536, without control characters, so in one line. Raises the revision. Throws
-    // InvalidRecord.
+    // key: 1 to 64 bytes; value: at most 65,536, without control characters, so in one line. Raises the revision.
+    // Throws InvalidRecord.
     void Set(std::string_view key, std::string_view value);
 
-    // Grows with every change of what is configured: cameras, mounts, plans, groups, e-maps, servers, settings; not with events,
-    // accounts or device states. Reads one row.
+    // Grows with every change of what is configured: cameras, mounts, plans, groups, e-maps, servers, settings; not
+    // with events, accounts or device states. Reads one row.
     std::int64_t Revision();
 
   private:

@@ -6,8 +6,10 @@
 //               more than check that the schema is the one this program knows. SQLite and PostgreSQL take the same
 //               statements; connection.cpp and store.cpp hold the differences.
 // Thread safety One Store per thread. Any number of processes. A Store must not be used across fork().
-// Failures      Besides what its declaration names, every function of a record class throws StoreError. Whatever it throws,
-//               a change is made whole or not at all, unless its declaration says otherwise. Times are UTC seconds since the epoch and come from the caller.
+// Failures      Besides what its declaration names, every function of a record class throws StoreError. Whatever it
+// throws,
+//               a change is made whole or not at all, unless its declaration says otherwise. Times are UTC seconds
+//               since the epoch and come from the caller.
 // See           cameras.h, events.h, users.h and the other headers of this folder: a class for each kind of record.
 #pragma once
 
@@ -18,9 +20,9 @@
 
 namespace lookhaven::store {
 
-// The store cannot be reached, failed, or was locked by other writers for five seconds. A change that failed so was not made,
-// unless the connection broke during its commit: look before repeating an Add. A Store that has lost its server stays
-// broken: open another one.
+// The store cannot be reached, failed, or was locked by other writers for five seconds. A change that failed so was not
+// made, unless the connection broke during its commit: look before repeating an Add. A Store that has lost its server
+// stays broken: open another one.
 class StoreError : public std::runtime_error {
   public:
     using std::runtime_error::runtime_error;

@@ -52,8 +52,8 @@ class Users {
     // Takes a tenth of a second and 64 MiB, as does every use of a password. Throws InvalidRecord or AlreadyExists.
     User Add(std::string_view name, std::string_view password, Privilege privilege);
 
-    // The account when name and password are right. An unknown name costs as much as a wrong password. A lack of those 64 MiB
-    // counts as a wrong one.
+    // The account when name and password are right. An unknown name costs as much as a wrong password. A lack of those
+    // 64 MiB counts as a wrong one.
     std::optional<VerifiedUser> CheckPassword(std::string_view name, std::string_view password);
 
     std::optional<User> Find(int id);
