@@ -148,7 +148,7 @@ void Add(const Console& console, const Request& request) {
         cameras.SetCredentials(camera.id, credentials);
     }
     SetPlan(store, camera.id, request, plan);
-    console.Answer(ToData(camera, plan), "The camera ", camera.name, " has the id ", camera.id, " and sends ",
+    console.Answer(ToData(camera, plan), "Added camera ", camera.name, " with id ", camera.id, "; it sends ",
                    VideoTypeName(camera.video_type), ".");
 }
 
@@ -171,7 +171,7 @@ void Change(const Console& console, const Request& request) {
     if (request.account) {
         cameras.SetCredentials(camera.id, credentials);
     }
-    console.Answer(ToData(camera, plan), "Camera ", camera.id, " was changed.");
+    console.Answer(ToData(camera, plan), "Changed camera ", camera.id, ".");
 }
 
 void List(const Console& console) {
@@ -188,7 +188,7 @@ void List(const Console& console) {
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras(store).Remove(request.id);
-    console.Answer(Object("id", request.id), "Camera ", request.id, " was removed; its recordings are kept.");
+    console.Answer(Object("id", request.id), "Removed camera ", request.id, "; its recordings are kept.");
 }
 
 void SetPorts(const Console& console, const Request& request) {

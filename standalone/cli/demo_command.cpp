@@ -26,9 +26,8 @@ void SetUp(const Console& console) {
     store::Store store = console.OpenStore();
     const std::string password = demo::HasViewer(store) ? "" : ReadPassword(demo::kViewer, true);
     const auto [cameras, viewer, emaps] = demo::SetUp(store, console.Installation().Home(), password);
-    console.Answer(Object("cameras_added", cameras, "viewer_added", viewer, "emaps_added", emaps),
-                   "The demo is set up: ", cameras, " cameras and ", emaps, " e-maps were added",
-                   viewer ? ", and the account viewer." : ".");
+    console.Answer(Object("cameras_added", cameras, "viewer_added", viewer, "emaps_added", emaps), "Added ", cameras,
+                   " demo cameras and ", emaps, " e-maps", viewer ? ", and the account viewer." : ".");
 }
 
 // Runs make, whose errors end the command.

@@ -106,7 +106,7 @@ void Add(const Console& console, const Request& request) {
     Apply(request, device);
     store::Store store = console.OpenStore();
     const int id = Devices(store).Add(device);
-    console.Answer(ToData(*Devices(store).Find(kind.type, id)), "The ", kind.name, " ", device.name, " has the id ", id,
+    console.Answer(ToData(*Devices(store).Find(kind.type, id)), "Added ", kind.name, " ", device.name, " with id ", id,
                    ".");
 }
 
@@ -116,7 +116,7 @@ void Change(const Console& console, const Request& request) {
     Device device = Require(Devices(store).Find(kind.type, request.id), "there is no ", kind.name, " ", request.id);
     Apply(request, device);
     Devices(store).Update(device);
-    console.Answer(ToData(device), "The ", kind.name, " ", device.name, " was changed.");
+    console.Answer(ToData(device), "Changed ", kind.name, " ", device.name, ".");
 }
 
 void List(const Console& console, const Request& request) {
@@ -129,14 +129,14 @@ void Remove(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
     Devices(store).Remove(kind.type, request.id);
-    console.Answer(Object("id", request.id), "The ", kind.name, " ", request.id, " was removed.");
+    console.Answer(Object("id", request.id), "Removed ", kind.name, " ", request.id, ".");
 }
 
 void Report(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
     Devices(store).Report({kind.type, request.id, request.port, request.state, base::WallMillis() / 1000});
-    console.Answer(Object("id", request.id, "state", request.state), "The ", kind.name, " ", request.id, " is ",
+    console.Answer(Object("id", request.id, "state", request.state), "Reported ", kind.name, " ", request.id, " as ",
                    request.state, ".");
 }
 

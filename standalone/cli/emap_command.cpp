@@ -77,7 +77,7 @@ void Add(const Console& console, const Request& request) {
     wanted.small_items = request.small_items.value_or(false);
     const Emap emap = AddFilled(store, wanted,
                                 [&](int id) { emap::Pictures(store, console.Installation().Home()).Put(id, picture); });
-    console.Answer(ToData(emap), "The e-map ", emap.name, " has the id ", emap.id, ".");
+    console.Answer(ToData(emap), "Added e-map ", emap.name, " with id ", emap.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
@@ -92,7 +92,7 @@ void Change(const Console& console, const Request& request) {
         emap::Pictures(store, console.Installation().Home()).Put(emap.id, *picture);
     }
     Emaps(store).Update(emap);
-    console.Answer(ToData(RequireEmap(store, emap.id)), "The e-map ", emap.id, " was changed.");
+    console.Answer(ToData(RequireEmap(store, emap.id)), "Changed e-map ", emap.id, ".");
 }
 
 void List(const Console& console) {
@@ -117,7 +117,7 @@ void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Emaps(store).Remove(request.id);
     emap::Pictures(store, console.Installation().Home()).Sweep();
-    console.Answer(Object("id", request.id), "The e-map ", request.id, " was removed.");
+    console.Answer(Object("id", request.id), "Removed e-map ", request.id, ".");
 }
 
 void Export(const Console& console, const Request& request) {
@@ -128,8 +128,7 @@ void Export(const Console& console, const Request& request) {
                                     "smallItemSize", emap.small_items, "items",
                                     emap::ToJson(Emaps(store).Items(emap.id)), "picture", base::ToBase64(picture));
     base::WriteFileAtomically(request.file, ToJson(file) + "\n", 0644);
-    console.Answer(Object("id", emap.id, "file", request.file), "The e-map ", emap.name, " was written to ",
-                   request.file, ".");
+    console.Answer(Object("id", emap.id, "file", request.file), "Wrote e-map ", emap.name, " to ", request.file, ".");
 }
 
 Json::Value ReadEmapFile(const std::string& path) {
@@ -162,7 +161,7 @@ void Import(const Console& console, const Request& request) {
     const std::size_t left_out = all - items.size();
     Json::Value data = ToData(emap);
     data["items_left_out"] = Json::UInt64(left_out);
-    console.Answer(data, "The e-map ", emap.name, " has the id ", emap.id, "; ", left_out,
+    console.Answer(data, "Added e-map ", emap.name, " with id ", emap.id, "; ", left_out,
                    " items were left out, since their devices do not exist here.");
 }
 

@@ -78,7 +78,7 @@ void Add(const Console& console, const Request& request) {
 void Move(const Console& console, const Request& request) {
     Edit(console, request.emap, [&](std::vector<EmapItem>& items) {
         Apply(request, Numbered(items, request.number));
-        return Concat("Item ", request.number, " was changed.");
+        return Concat("Changed item ", request.number, ".");
     });
 }
 
@@ -86,7 +86,7 @@ void Remove(const Console& console, const Request& request) {
     Edit(console, request.emap, [&](std::vector<EmapItem>& items) {
         Numbered(items, request.number);
         items.erase(items.begin() + request.number - 1);
-        return Concat("Item ", request.number, " was removed; the items after it are renumbered.");
+        return Concat("Removed item ", request.number, "; the items after it are renumbered.");
     });
 }
 

@@ -167,7 +167,7 @@ void AddMark(const Console& console, const Request& request) {
     }
     store::Store store = console.OpenStore();
     const Mark mark = Marks(store).Add(request.mark_kind, request.camera, moment, ParseDuration(request.length), text);
-    console.Answer(ToData(mark), "The ", mark.kind == MarkKind::kAlert ? "alert" : "POS transaction", " has the id ",
+    console.Answer(ToData(mark), "Added ", mark.kind == MarkKind::kAlert ? "alert" : "POS transaction", " with id ",
                    mark.id, "; its footage from ", FormatMoment(mark.start_s), " to ", FormatMoment(mark.end_s),
                    " is saved once it is recorded.");
 }

@@ -33,7 +33,7 @@ void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     CameraGroup group{0, request.name.value_or(""), {request.add.begin(), request.add.end()}};
     group.id = Groups(store).Add(group);
-    console.Answer(ToData(group), "The group ", group.name, " has the id ", group.id, ".");
+    console.Answer(ToData(group), "Added group ", group.name, " with id ", group.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
@@ -46,7 +46,7 @@ void Change(const Console& console, const Request& request) {
     }
     Groups(store).Update(group);
     const Json::Value data = ToData(group);
-    console.Answer(data, "The group ", group.name, " has the cameras ", PlainText(data["cameras"]), ".");
+    console.Answer(data, "Group ", group.name, " has the cameras ", PlainText(data["cameras"]), ".");
 }
 
 void List(const Console& console) {
@@ -58,7 +58,7 @@ void List(const Console& console) {
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Groups(store).Remove(request.id);
-    console.Answer(Object("id", request.id), "The group ", request.id, " was removed; its cameras are kept.");
+    console.Answer(Object("id", request.id), "Removed group ", request.id, "; its cameras are kept.");
 }
 
 }  // namespace

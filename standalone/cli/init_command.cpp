@@ -70,7 +70,8 @@ void Init(const Console& console, const Request& request) {
     const std::string home = installation.Home().string();
     std::string text = "The state folder " + home + " is ready.";
     if (!admin.empty()) {
-        text += "\nThe account " + admin + (admin_added ? " was added." : " exists already and was not changed.");
+        text += admin_added ? "\nAdded account " + admin + "."
+                            : "\nAccount " + admin + " exists already and was not changed.";
     }
     console.Answer(Object("home", home, "migrations", steps, "admin_added", admin_added, "mount_added", mount_added),
                    text);

@@ -101,7 +101,7 @@ void Add(const Console& console, const Request& request) {
     }
     mount.id = Mounts(store).Add(mount);
     maintenance::MountFolder::WriteMarker(mount.path, mount.id);
-    console.Answer(ToData(*Mounts(store).Find(mount.id)), "The mount ", mount.name, " has the id ", mount.id, ".");
+    console.Answer(ToData(*Mounts(store).Find(mount.id)), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
@@ -112,7 +112,7 @@ void Change(const Console& console, const Request& request) {
     if (!request.path.empty()) {
         maintenance::MountFolder::WriteMarker(mount.path, mount.id);
     }
-    console.Answer(ToData(mount), "The mount ", mount.name, " was changed.");
+    console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
 }
 
 void List(const Console& console) {
@@ -139,8 +139,8 @@ void Remove(const Console& console, const Request& request) {
                       " events: with --forget they are removed from the store too, while the files stay");
     }
     Mounts(store).Remove(request.id, request.forget);
-    console.Answer(Object("id", request.id, "events_forgotten", events), "The mount ", request.id,
-                   " was removed; its files stay.");
+    console.Answer(Object("id", request.id, "events_forgotten", events), "Removed mount ", request.id,
+                   "; its files stay.");
 }
 
 }  // namespace

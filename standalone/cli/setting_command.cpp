@@ -69,7 +69,7 @@ void AddSetting(CLI::App& program, const Console& console) {
             .Option("value", set.request().value, "", Required, Satisfies(CLI::Range(setting.min, setting.max)));
     }
     CommandGroup<Request> role(program, console, "set", "The role of this host");
-    role.Add("cms", "Whether this host manages its recording servers", SetCms)
+    role.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
         .Option("value", role.request().cms, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
 }
 

@@ -99,7 +99,7 @@ void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const Json::Value user =
         ToData(Users(store).Add(request.name, ReadPassword(request.name, true), request.privilege));
-    console.Answer(user, "The account ", request.name, " was added as ", PrivilegeName(user["privilege"]), ".");
+    console.Answer(user, "Added account ", request.name, " as ", PrivilegeName(user["privilege"]), ".");
 }
 
 void List(const Console& console) {
@@ -124,7 +124,7 @@ void SetPassword(const Console& console, const Request& request) {
     Users users(store);
     const User user = RequireUser(users, request.name);
     users.SetPassword(user.id, ReadPassword(user.name, true));
-    console.Answer(ToData(user), "The account ", user.name, " has a new password and is logged out everywhere.");
+    console.Answer(ToData(user), "Account ", user.name, " has a new password and is logged out everywhere.");
 }
 
 void Remove(const Console& console, const Request& request) {
@@ -136,7 +136,7 @@ void Remove(const Console& console, const Request& request) {
         throw Failure(kDataError, user.name, " is the only owner: add another one first");
     }
     users.Remove(user.id);
-    console.Answer(ToData(user), "The account ", user.name, " was removed.");
+    console.Answer(ToData(user), "Removed account ", user.name, ".");
 }
 
 void PermitKind(Users& users, int user, const Request& request, bool allow, CameraAccess kind) {

@@ -41,7 +41,7 @@ TEST_F(CliTest, SetUpIsRepeatableAndKeepsWhatIsThere) {
     Play({{"init --admin admin", 65, "no password"},
           {"init --admin admin", 65, "8 to 1024", "", "short\n"},
           {"init --admin Lookhaven", 65, "reserved", "", "admin-s3cret\n"},
-          {"init --admin admin", 0, "account admin was added", "", "admin-s3cret\n"},
+          {"init --admin admin", 0, "Added account admin", "", "admin-s3cret\n"},
           {"init --admin admin", 0, "was not changed", "", "other-s3cret\n"},
           {"demo setup", 65, "no password"},
           {"demo setup --json", 0, "\"cameras_added\" : 4", "", "viewer-s3cret\r\n"},
@@ -85,7 +85,7 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
           {"camera list --json", 0, "\"audio\" : true,\n    \"enabled\" : true,\n    \"id\" : 6"},
           {"camera set 6 --name y --json", 0, "\"audio\" : true,\n  \"enabled\" : true"},
           {"camera set 6 --no-audio --ptz --json", 0, "\"audio\" : false,\n  \"enabled\" : true"},
-          {"camera set 6 --audio", 0, "was changed"},
+          {"camera set 6 --audio", 0, "Changed"},
           {"camera probe 'test:mjpeg?size=160x120&fps=20'", 0, "MJPEG 160x120, 20"},
           {"camera probe 6 --json", 0, "\"sample_rate\""},
           {"camera probe 99", 66, "no camera 99"},
@@ -102,7 +102,7 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
           {"camera add --name x --source test:mjpeg --type mjpeg --size 12y", 64, "looks like 1280x720"},
           {"camera add --name x --source test:mjpeg --type mpeg4", 64, "--type"},
           {"camera add --name x", 64, "--source"},
-          {"camera remove 6", 0, "was removed"},
+          {"camera remove 6", 0, "Removed"},
           {"camera remove 6", 66, "no camera 6"},
           {"camera remove 2147483648", 64, "malformed"},
           {"camera remove abc", 64, "malformed"},
@@ -115,7 +115,7 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
     EXPECT_FALSE(camera.enabled);
     EXPECT_EQ(camera.FindProfile(1)->height, 360);
     EXPECT_EQ(camera.FindProfile(0)->fps, 10);
-    Play({{"camera set 5 --account ''", 0, "was changed"}});
+    Play({{"camera set 5 --account ''", 0, "Changed"}});
     EXPECT_FALSE(cameras.FindCredentials(5));
 }
 

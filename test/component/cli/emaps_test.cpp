@@ -27,7 +27,7 @@ TEST_F(EmapsTest, MapsAreMadeFilledCarriedOverAndRemoved) {
           {"emap add Bad /no/such", 66, "/no/such"},
           {"emap list", 0, "Yard", "Bad"},
           {"emap set 3 --small-items --name Court --json", 0, "\"hideItemName\" : true"},
-          {"emap set 3 --large-items", 0, "was changed"},
+          {"emap set 3 --large-items", 0, "Changed"},
           {"emap set 9 --name x", 66, "no e-map 9"},
           {"emap item add 3 camera 4 --name Gate --x 1 --y 2 --direction 90", 0, "item 1"},
           {"emap item add 3 emap 1", 0, "item 2"},
@@ -39,9 +39,9 @@ TEST_F(EmapsTest, MapsAreMadeFilledCarriedOverAndRemoved) {
           {"emap show 3", 0, "Gate"},
           {"emap export 3 " + out, 0, "map.json"},
           {"emap import " + out, 65, "already an e-map"},
-          {"emap item remove 3 2", 0, "Item 2 was removed"},
-          {"emap remove 3", 0, "was removed"},
-          {"camera remove 4", 0, "was removed"},
+          {"emap item remove 3 2", 0, "Removed item 2"},
+          {"emap remove 3", 0, "Removed"},
+          {"camera remove 4", 0, "Removed"},
           {"emap import " + out + " --name Again", 0, "1 items were left out"},
           {"emap show 5", 0, "emap", "camera"},
           {"emap import " + File("broken", "{\"lookhaven_emap\":1,"), 65, "no e-map"},
@@ -69,7 +69,7 @@ TEST_F(EmapsTest, DevicesAreKnownReportedAndDenied) {
           {"user list", 0, "e-map 2; door 2"},
           {"user allow viewer --door 2", 0, "allowed"},
           {"user list", 0, "e-map 2", "door 2"},
-          {"door remove 3", 0, "was removed"},
+          {"door remove 3", 0, "Removed"},
           {"door remove 3", 66, "no door 3"}});
     store::Store store = Open();
     EXPECT_TRUE(store::Devices(store).Find(store::EmapItemType::kIoModule, 2)->ports.contains(5));

@@ -59,8 +59,8 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
           {"event list --kind pos --camera 2", 0, "saved  2 x Coffee", "pending"}});
 
     // A second set-up takes nothing back, and lowers no limit under which there may be recordings.
-    Play({{"mount set 1 --limit 900G", 0, "was changed"},
-          {"camera set 1 --record never", 0, "was changed"},
+    Play({{"mount set 1 --limit 900G", 0, "Changed"},
+          {"camera set 1 --record never", 0, "Changed"},
           {"group set 1 --name Hof --drop 2", 0, "the cameras 1."},
           {"init", 0, "ready"},
           {"demo setup", 0, "0 cameras"}});
@@ -146,7 +146,7 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
     std::ofstream(folder_ / "file");
     Play({{"mount add " + (folder_ / "none").string(), 66, "no folder"},
           {"mount add " + (folder_ / "file").string(), 66, "no folder"},
-          {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "mount disk has the id"},
+          {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "Added mount disk with id"},
           {"mount add " + (folder_ / "link").string() + " --name other", 65, "inside each other"},
           {"mount add " + disk + " --limit 5X", 64, "a size looks like"},
           {"mount list", 0, "1.5 TiB  30d"},
@@ -161,7 +161,7 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
           {"mount list", 0, "default disabled"},
           {"camera set 1 --mount 1 --json", 0, "\"mount_id\" : 1"},
           {"mount remove 1", 65, "cameras record"},
-          {"camera set 1 --mount 0", 0, "was changed"}});
+          {"camera set 1 --mount 0", 0, "Changed"}});
     store::Events events(store);
     AddRow(events, 1, kStart, base::kReasonContinuous, false);
     Play({{"mount remove 1", 65, "--forget"},
@@ -171,8 +171,8 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
 }
 
 TEST_F(RecordingsTest, PlansAndGroupsAreChangedAndDenied) {
-    Play({{"camera set 3 --record always --segment 1m --pre 0 --post 5m --record-profile low", 0, "was changed"},
-          {"camera set 3 --name Hall", 0, "was changed"},
+    Play({{"camera set 3 --record always --segment 1m --pre 0 --post 5m --record-profile low", 0, "Changed"},
+          {"camera set 3 --name Hall", 0, "Changed"},
           {"camera list --json", 0, "\"segment\" : 60"},
           {"camera set 3 --segment 5s", 65, "10 to 3600"},
           {"camera set 3 --segment 99999999999d", 64, "a duration looks like"},
