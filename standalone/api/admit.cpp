@@ -28,6 +28,10 @@ bool IsCrossSite(const http::Request& request) {
 
 }  // namespace
 
+const char* SessionCookie(const http::Request& request) {
+    return request.Header("HTTPS") == "on" ? "__Host-id" : "id";
+}
+
 std::optional<binding::Login> FindLogin(const Call& call) {
     if (IsCrossSite(call.request)) {
         // The page of a paired host shows this host's cameras with a token of its own; the session is not its to use.
@@ -36,7 +40,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
         }
         throw Failure(403, "another site's page may not ask for this");
     }
-    const auto cookie = call.cookies.find(kSessionCookie);
+    const auto cookie = call.cookies.find(SessionCookie(call.request));
     if (cookie == call.cookies.end() || cookie->second.empty()) {
         return std::nullopt;
     }

@@ -23,7 +23,7 @@ std::int64_t NowSeconds() {
 }
 
 std::string CookieLine(const http::Request& request, const std::string& value) {
-    return std::string("Set-Cookie: ") + kSessionCookie + '=' + value + "; Path=/; HttpOnly; SameSite=Strict" +
+    return std::string("Set-Cookie: ") + SessionCookie(request) + '=' + value + "; Path=/; HttpOnly; SameSite=Strict" +
            (request.Header("HTTPS") == "on" ? "; Secure\r\n" : "\r\n");
 }
 

@@ -3,48 +3,55 @@
 // VEXO.Relay: the live view of a recording server's camera on this host's origin.
 //
 // Why so        A browser has no session at the other server. This host checks whether the caller may see the camera,
-//               and has the web server fetch it with a token that is valid for minutes; secret and token never reach
-//               the browser.
+//               and fetches it with a token that is valid for minutes; secret and token never reach the browser. The
+//               request process holds the connection to the other server, so what ends any stream ends this one.
 #include "standalone/api/own_apis.h"
 
-#include <memory>
-
-#include <netdb.h>
-#include <sys/socket.h>
+#include <poll.h>
+#include <unistd.h>
 
 #include "standalone/base/clock.h"
-#include "standalone/base/file_descriptor.h"
+#include "standalone/base/log.h"
 #include "standalone/binding/pair_token.h"
 #include "standalone/binding/rights.h"
+#include "standalone/remote/live_view.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::api {
 
 namespace {
 
-// Sends nothing: a datagram socket can be connected only where there is a route.
-bool HasRoute(const addrinfo& address) {
-    const base::FileDescriptor probe(::socket(address.ai_family, SOCK_DGRAM | SOCK_CLOEXEC, 0));
-    return probe && ::connect(probe.Get(), address.ai_addr, address.ai_addrlen) == 0;
-}
+// Sends the answer on as this host's own.
+class Relay : public remote::LiveSink {
+  public:
+    explicit Relay(const Call& call) : call_(call), output_(*call.context.output()) {}
 
-// Names are resolved here: the web server would resolve them once, when it starts, and not start when one fails.
-std::string NumericAddress(const std::string& name, int port) {
-    addrinfo hints{};
-    hints.ai_socktype = SOCK_STREAM;
-    addrinfo* found = nullptr;
-    if (::getaddrinfo(name.c_str(), std::to_string(port).c_str(), &hints, &found) == 0) {
-        const std::unique_ptr<addrinfo, decltype(&::freeaddrinfo)> owned(found, ::freeaddrinfo);
-        for (const addrinfo* each = found; each != nullptr; each = each->ai_next) {
-            char text[NI_MAXHOST];
-            if (HasRoute(*each) &&
-                ::getnameinfo(each->ai_addr, each->ai_addrlen, text, sizeof text, nullptr, 0, NI_NUMERICHOST) == 0) {
-                return each->ai_family == AF_INET6 ? "[" + std::string(text) + "]" : text;
-            }
+    bool Begin(std::string_view content_type, std::int64_t size) override {
+        if (content_type.starts_with("multipart")) {
+            call_.context.NoteStream();
         }
+        const std::string length = size < 0 ? "" : "Content-Length: " + std::to_string(size) + "\r\n";
+        const std::string head =
+            "Status: 200 OK\r\nCache-Control: no-store\r\nContent-Type: " + std::string(content_type) + "\r\n" +
+            length + "\r\n";
+        return Write(head);
     }
-    throw Failure(502, "the recording server's host name cannot be resolved");
-}
+
+    bool Write(std::span<const char> bytes) override {
+        iovec piece{const_cast<char*>(bytes.data()), bytes.size()};
+        return output_.Send({&piece, 1});
+    }
+
+    // A viewer who has gone shows only where something is sent.
+    bool GoesOn() override {
+        pollfd viewer{STDOUT_FILENO, POLLRDHUP, 0};
+        return !call_.slot.must_end && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
+    }
+
+  private:
+    const Call& call_;
+    binding::Output& output_;
+};
 
 // "&name=number" when it was given.
 std::string Passed(const Call& call, const char* name) {
@@ -66,15 +73,23 @@ std::string Play(const Call& call) {
     }
     const std::string id = std::to_string(camera->id_on_server);
     const std::string timestamp = std::to_string(base::WallMillis() / 1000);
-    std::string query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
-                        Passed(call, "snapshot") + Passed(call, "profileType") +
-                        "&cookie=" + binding::MakePairToken(secret, timestamp);
+    remote::LiveRequest request;
+    request.query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
+                    Passed(call, "snapshot") + Passed(call, "profileType");
+    request.cookie = "timestamp=" + timestamp;
+    request.form = "cookie=" + binding::MakePairToken(secret, timestamp);
     if (!binding::MayUse(camera->id, store::CameraAccess::kAudio)) {
-        query += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
+        request.form += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
     }
-    return "Status: 200 OK\r\nX-Accel-Redirect: /relay/" + std::to_string(server_id) + "/" +
-           NumericAddress(server->address, server->port) + "/" + std::to_string(server->port) + "/" + timestamp + "?" +
-           query + "\r\nContent-Length: 0\r\n\r\n";
+    call.context.CloseRecords();
+    Relay relay(call);
+    try {
+        remote::FetchLiveView({server->address, server->port, server->certificate}, request, relay);
+    } catch (const remote::NoLiveView& error) {
+        base::LogWarning("no live view from " + server->name + ": " + error.what());
+        throw Failure(502, "the recording server does not answer, or does not let this host in");
+    }
+    return "";
 }
 
 constexpr Method kMethods[] = {{"Play", Play}};

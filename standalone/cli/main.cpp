@@ -9,6 +9,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/media/source.h"
+#include "standalone/remote/certificate.h"
 
 namespace lookhaven::cli {
 
@@ -92,6 +93,8 @@ int Run(int argc, char** argv) {
         return Report(console, kUnavailable, error.what());
     } catch (const media::SourceError& error) {
         return Report(console, kUnavailable, std::string("the source cannot be used (") + error.what() + ")");
+    } catch (const remote::InvalidCertificate& error) {
+        return Report(console, kDataError, error.what());
     } catch (const archive::ArchiveError& error) {
         return Report(console, kDataError, error.what());
     } catch (const std::system_error& error) {

@@ -10,12 +10,11 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
-#include "standalone/cli/certificate.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
-#include "standalone/cli/relay_config.h"
 #include "standalone/cli/table.h"
+#include "standalone/remote/certificate.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 
@@ -72,7 +71,7 @@ std::vector<RemoteCamera> OwnCameras(store::Store& store) {
 void Pair(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::string certificate =
-        CertificatesIn(base::ReadFile(console.Installation().TlsFolder() / "certificate.pem"));
+        remote::CertificatesIn(base::ReadFile(console.Installation().TlsFolder() / "certificate.pem"));
     const PairOffer offer{request.address.empty() ? HostName() : request.address, request.port, certificate,
                           store::RandomHex(kSecretBytes), OwnCameras(store)};
     RecordingServer watcher;
@@ -99,20 +98,19 @@ std::string ReadPairText() {
 
 void Add(const Console& console, const Request& request) {
     const PairOffer offer = ParsePairText(ReadPairText());
-    CertificateName(offer.certificate);  // throws before anything is stored
+    remote::CertificateName(offer.certificate);  // throws before anything is stored
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
     RecordingServer server{.name = request.name,
                            .address = request.address.empty() ? offer.address : request.address,
                            .port = offer.port,
-                           .certificate = CertificatesIn(offer.certificate)};
+                           .certificate = remote::CertificatesIn(offer.certificate)};
     server.id = servers.Add(server, offer.secret);
     try {
         for (RemoteCamera camera : offer.cameras) {
             camera.server_id = server.id;
             servers.PutCamera(camera);
         }
-        WriteRelayConfig(console.Installation(), servers.List());
     } catch (...) {
         servers.Remove(server.id);
         throw;
@@ -131,7 +129,6 @@ void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
     servers.Remove(request.id);
-    WriteRelayConfig(console.Installation(), servers.List());
     console.Answer(Object("id", request.id), "The server ", request.id, " was removed, and its cameras with it.");
 }
 
@@ -142,12 +139,6 @@ void ListCameras(const Console& console) {
                       camera.id_on_server);
     });
     console.Answer(data, Table(kCameraColumns, data));
-}
-
-// Run before nginx starts, whose configuration includes what this writes.
-void Configure(const Console& console) {
-    store::Store store = console.OpenStore();
-    WriteRelayConfig(console.Installation(), RecordingServers(store).List());
 }
 
 }  // namespace
@@ -166,7 +157,6 @@ void AddServer(CLI::App& program, const Console& console) {
     group.Add("list", "Lists the hosts", List);
     group.Add("cameras", "Lists the cameras of other hosts with their ids here", ListCameras);
     group.Add("remove", "Ends a pairing", Remove).Option("id", request.id, "The host's id", Required);
-    group.Add("configure", "Rewrites nginx's configuration of these hosts", Configure).Hide();
 }
 
 }  // namespace lookhaven::cli

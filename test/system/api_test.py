@@ -103,8 +103,9 @@ class ApiTest(unittest.TestCase):
     def test_log_ins_are_throttled_by_address(self):
         with Installation() as server:
             form = {"account": "nobody", "password": "x"}
-            seen = [server.request({**LOGIN, "x": n}, form={**form, "account": f"a{n}"}).status for n in range(40)]
-            self.assertEqual((seen[0], seen[-1]), (401, 429), seen)
+            # Refused before any password is hashed, so that 40 are sent faster than the limit forgets, on any machine.
+            seen = [server.request({**LOGIN, "account": "nobody"}, form=form).status for _ in range(40)]
+            self.assertEqual((seen[0], seen[-1]), (400, 429), seen)
             # Neither a body nor an escape hides what is asked for.
             for query in ("", "api=VEXO%2EAuth&version=1&method=Login", "api=VEXO.Event&api=VEXO.Auth&method=Login"):
                 self.assertEqual(server.request(query, form=form).status, 429, query)

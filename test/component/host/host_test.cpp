@@ -299,15 +299,18 @@ TEST_F(RunningHost, LogsInAndOut) {
     EXPECT_EQ(host_.Ask(query + "Login", "", {}, "").status, 405);
     const Answer plain = host_.Ask(query + "Login", "", {}, right);
     EXPECT_EQ(plain.status, 200);
-    EXPECT_EQ(plain.headers.at("Set-Cookie").find("Secure"), std::string::npos);
+    const std::string plain_line = plain.headers.at("Set-Cookie");
+    EXPECT_TRUE(plain_line.starts_with("id=") && plain_line.find("Secure") == std::string::npos) << plain_line;
     const Answer answer = host_.Ask(query + "Login", "", {{"HTTPS", "on"}, {"CONTENT_TYPE", "application/json"}},
                                     R"({"account":"admin","password":"right password"})");
     EXPECT_EQ(answer.Json()["data"]["account"], "admin");
     EXPECT_EQ(answer.Json()["data"]["is_manager"], true);
     const std::string line = answer.headers.at("Set-Cookie");
-    EXPECT_TRUE(line.ends_with("; Path=/; HttpOnly; SameSite=Strict; Secure")) << line;
-    const std::string cookie = line.substr(3, line.find(';') - 3);
+    const std::string name = "__Host-id=";
+    EXPECT_TRUE(line.starts_with(name) && line.ends_with("; Path=/; HttpOnly; SameSite=Strict; Secure")) << line;
+    const std::string cookie = line.substr(name.size(), line.find(';') - name.size());
     EXPECT_EQ(host_.Ask(query + "Status", cookie).Json()["data"], answer.Json()["data"]);
+    EXPECT_EQ(host_.Ask(query + "Status", cookie, {{"HTTPS", "on"}}).status, 401) << "its name over plain HTTP";
     EXPECT_EQ(host_.Ask(query + "Logout", cookie).status, 405);
     EXPECT_EQ(host_.Ask(query + "Logout", cookie, {}, "a=1").status, 200);
     EXPECT_EQ(host_.Ask(query + "Status", cookie).status, 401);

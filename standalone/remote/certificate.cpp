@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/cli/certificate.h"
+#include "standalone/remote/certificate.h"
 
 #include <memory>
 #include <optional>
@@ -7,9 +7,7 @@
 #include <openssl/pem.h>
 #include <openssl/x509v3.h>
 
-#include "standalone/cli/console.h"
-
-namespace lookhaven::cli {
+namespace lookhaven::remote {
 
 namespace {
 
@@ -29,7 +27,7 @@ Bio Open(const std::string& pem) {
 Certificate RequireFirst(const Bio& bio) {
     Certificate certificate = ReadNext(bio);
     if (!certificate) {
-        throw Failure(kDataError, "there is no certificate in PEM format");
+        throw InvalidCertificate("there is no certificate in PEM format");
     }
     return certificate;
 }
@@ -79,12 +77,12 @@ std::string CertificateName(const std::string& pem) {
     if (name.starts_with("*.")) {
         name.replace(0, 1, "host");
     }
-    // The name becomes part of nginx's configuration.
+    // The name becomes part of an address.
     if (name.empty() || name.size() > 253 ||
         name.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789.-_") != name.npos) {
-        throw Failure(kDataError, "the certificate names no valid host");
+        throw InvalidCertificate("the certificate names no valid host");
     }
     return name;
 }
 
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::remote
