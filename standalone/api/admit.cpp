@@ -1,6 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/admit.h"
 
+#include <algorithm>
+#include <chrono>
+#include <limits>
+#include <thread>
+
+#include "standalone/api/own_apis.h"
+#include "standalone/api/player.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
@@ -26,10 +33,44 @@ bool IsCrossSite(const http::Request& request) {
     return scheme_end == origin.npos || origin.substr(scheme_end + 3) != request.Header("HTTP_HOST");
 }
 
+constexpr int kRetryAfterSeconds = 1;
+constexpr std::chrono::milliseconds kSearchPoll{10};
+constexpr std::chrono::seconds kSearchWait{10};
+
+void Occupy(control::SlotTable& slots, control::Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
+    switch (slots.Admit(slot, user, max_of_user, max_in_all)) {
+    case control::Admission::kGranted:
+        return;
+    case control::Admission::kTooManyOfUser:
+        throw Failure(503, "too many requests of this account are running", kRetryAfterSeconds);
+    case control::Admission::kTooMany:
+        throw Failure(503, "too many requests are running", kRetryAfterSeconds);
+    }
+}
+
+void AwaitSearch(const Call& call, std::size_t max_of_user) {
+    const auto until = std::chrono::steady_clock::now() + kSearchWait;
+    while (!call.slots.BeginSearch(call.slot, max_of_user)) {
+        if (std::chrono::steady_clock::now() > until) {
+            throw Failure(503, "too many searches of this account are running", kRetryAfterSeconds);
+        }
+        call.context.CloseRecords();
+        std::this_thread::sleep_for(kSearchPoll);
+    }
+}
+
 }  // namespace
 
 const char* SessionCookie(const http::Request& request) {
     return request.Header("HTTPS") == "on" ? "__Host-id" : "id";
+}
+
+Load LoadOf(const Call& call) {
+    if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || IsPlayer(call)) {
+        return Load::kPictures;
+    }
+    const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name;
+    return is_light ? Load::kLittle : Load::kSearch;
 }
 
 std::optional<binding::Login> FindLogin(const Call& call) {
@@ -59,7 +100,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
                           session->user.IsManager()};
 }
 
-void Admit(const Call& call, std::size_t max_requests) {
+void Admit(const Call& call, const RequestLimits& limits) {
     const Json::Value& priv_data = call.Parameter("privData");
     call.context.RestrictByPrivData(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
     if (!call.login) {
@@ -71,9 +112,15 @@ void Admit(const Call& call, std::size_t max_requests) {
     call.context.SetCaller(call.login->user_id);
     call.context.SetSession(call.login->session_handle);
     control::SlotTable::SetSession(call.slot, call.login->session_handle);
-    if (call.slots.OlderRequests(call.slot) >= max_requests) {
-        throw Failure(503, "too many requests of this session are running");
+    Occupy(call.slots, call.slot, static_cast<int>(call.login->user_id), limits.per_user,
+           call.login->is_manager ? std::numeric_limits<std::size_t>::max() : limits.but_managers);
+    if (LoadOf(call) == Load::kSearch) {
+        AwaitSearch(call, limits.searches_per_user);
     }
+}
+
+void AdmitPeer(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
+    Occupy(slots, slot, store::kPeerUserId, limits.per_user, limits.but_managers);
 }
 
 }  // namespace lookhaven::api

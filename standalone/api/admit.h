@@ -19,9 +19,27 @@ const char* SessionCookie(const http::Request& request);
 // authenticates its callers itself, which has no session then. Throws store::StoreError.
 std::optional<binding::Login> FindLogin(const Call& call);
 
-// Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure
-// 401 without a session, except at the API that authenticates its callers itself; 503 when max_requests of the session
-// run already.
-void Admit(const Call& call, std::size_t max_requests);
+// How many admitted requests run at once.
+struct RequestLimits {
+    std::size_t but_managers = 256;  // of all callers but managers
+    std::size_t per_user = 64;       // paired hosts are one user together
+    std::size_t searches_per_user = 4;
+};
+
+// What serving a call takes.
+enum class Load {
+    kLittle,
+    kPictures,  // the memory of rings and decoders; mostly waits for a camera
+    kSearch,    // seconds of a processor, perhaps
+};
+Load LoadOf(const Call& call);
+
+// Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure 401 without
+// a session, except at the API that authenticates its callers itself; 503 beyond a limit. Of the searches of a user,
+// those beyond the limit wait, ten seconds at most.
+void Admit(const Call& call, const RequestLimits& limits);
+
+// Counts the request as one of the paired hosts. Throws Failure 503 beyond a limit.
+void AdmitPeer(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits);
 
 }  // namespace lookhaven::api

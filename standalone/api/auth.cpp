@@ -6,6 +6,7 @@
 #include <arpa/inet.h>
 
 #include "standalone/api/admit.h"
+#include "standalone/api/login_log.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 
@@ -17,6 +18,26 @@
 namespace lookhaven::api {
 
 namespace {
+
+constexpr std::size_t kMaxHashing = 4;  // at once, in 64 MiB each
+constexpr int kRetryAfterSeconds = 1;
+
+// Whoever checks or hashes a password on request holds this meanwhile.
+class HashingPlace {
+  public:
+    // Throws Failure 503 when there is none.
+    explicit HashingPlace(const Call& call) : slot_(call.slot) {
+        if (!call.slots.BeginHashing(slot_, kMaxHashing)) {
+            throw Failure(503, "too many log-ins at once; try again in a moment", kRetryAfterSeconds);
+        }
+    }
+    ~HashingPlace() { control::SlotTable::EndWork(slot_); }
+    HashingPlace(const HashingPlace&) = delete;
+    HashingPlace& operator=(const HashingPlace&) = delete;
+
+  private:
+    control::Slot& slot_;
+};
 
 std::int64_t NowSeconds() {
     return base::WallMillis() / 1000;
@@ -49,28 +70,41 @@ std::string NetworkOf(std::string_view address) {
     return std::string(::inet_ntop(AF_INET6, &bytes, text, sizeof text)) + "/64";
 }
 
+// Throws Failure for who may not log in, or not now. An attempt for which there is no room does not count as one.
+store::VerifiedUser CheckPassword(const Call& call, const std::string& account) {
+    const HashingPlace place(call);
+    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+    store::LoginThrottle throttle(call.Records());
+    if (const int wait_s = throttle.Enter(account, network, NowSeconds()); wait_s > 0) {
+        throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds", wait_s);
+    }
+    const auto user = store::Users(call.Records()).CheckPassword(account, call.Parameter("password").asString());
+    if (!user) {
+        throw Failure(401, "wrong account or password");
+    }
+    throttle.Clear(account, network);
+    return *user;
+}
+
 std::string LogIn(const Call& call) {
-    store::Store& records = call.Records();
     const Parameters query = ReadQuery(call.request);
     if (query.contains("account") || query.contains("password")) {
         throw Failure(400, "account and password belong in the body: URLs end up in logs and browser histories");
     }
     const std::string account = call.Parameter("account").asString();
-    const std::string address = NetworkOf(call.request.Header("REMOTE_ADDR"));
-    store::LoginThrottle throttle(records);
-    if (const int wait_s = throttle.Enter(account, address, NowSeconds()); wait_s > 0) {
-        throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds");
-    }
-    const auto user = store::Users(records).CheckPassword(account, call.Parameter("password").asString());
-    if (!user) {
-        throw Failure(401, "wrong account or password");
-    }
-    throttle.Clear(account, address);
+    const std::string_view address = call.request.Header("REMOTE_ADDR");
+    store::Store& records = call.Records();
     try {
-        const store::NewSession session = store::Sessions(records).Create(*user, NowSeconds());
-        return SuccessAnswer(Identity(records, user->name, user->id, user->IsManager()),
+        const store::VerifiedUser user = CheckPassword(call, account);
+        const store::NewSession session = store::Sessions(records).Create(user, NowSeconds());
+        LogAccepted(call.context.Home(), user.name, address);
+        return SuccessAnswer(Identity(records, user.name, user.id, user.IsManager()),
                              CookieLine(call.request, session.secret));
+    } catch (const Failure& failure) {
+        LogRefused(call.context.Home(), account, address, failure.what());
+        throw;
     } catch (const store::NotFound&) {  // removed, or its password changed, in this moment
+        LogRefused(call.context.Home(), account, address, "the account has changed in this moment");
         throw Failure(401, "wrong account or password");
     }
 }

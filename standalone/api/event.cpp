@@ -20,6 +20,8 @@ namespace {
 
 constexpr std::int64_t kMaxAheadSeconds = 3600;  // a POS terminal's clock may be off
 constexpr int kMaxListed = 10'000;
+constexpr int kMaxOffset = 100'000;
+constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
 
 std::optional<store::MarkKind> KindOf(const Call& call) {
     const Json::Value kind = call.Parameter("kind");
@@ -131,6 +133,9 @@ std::set<int> CamerasOf(const Call& call) {
     if (!asked.isNull()) {
         const std::list<int> numbers = String2IntList(asked.asString(), ",");
         ids.insert(numbers.begin(), numbers.end());
+        if (ids.size() > kMaxCameras) {
+            throw Failure(400, "cameralists names more than " + std::to_string(kMaxCameras) + " cameras");
+        }
         const std::set<int> denied = binding::DeniedCameras(store::CameraAccess::kPlayback);
         std::erase_if(ids, [&denied](int id) { return denied.contains(id); });
         return ids;
@@ -150,8 +155,7 @@ std::string List(const Call& call) {
     filter.newest_first = true;
     const std::int64_t offset = call.NumberOr("offset", 0);
     const std::int64_t limit = call.NumberOr("limit", 1000);
-    if (filter.end_s <= filter.begin_s || offset < 0 || offset > std::numeric_limits<int>::max() || limit < 1 ||
-        limit > kMaxListed) {
+    if (filter.end_s <= filter.begin_s || offset < 0 || offset > kMaxOffset || limit < 1 || limit > kMaxListed) {
         throw Failure(400, "from, to, offset or limit is out of its bounds");
     }
     filter.offset = static_cast<int>(offset);

@@ -38,12 +38,26 @@ bool IsText(std::string_view bytes) {
     return true;
 }
 
+// The same for all texts inside: an escape of JSON too may stand for a NUL, or for half a character.
+bool IsText(const Json::Value& value) {
+    if (value.isString()) {
+        return IsText(std::string_view(value.asString()));
+    }
+    if (value.isObject()) {
+        const Json::Value::Members names = value.getMemberNames();
+        if (!std::ranges::all_of(names, [](const std::string& name) { return IsText(std::string_view(name)); })) {
+            return false;
+        }
+    }
+    return std::all_of(value.begin(), value.end(), [](const Json::Value& member) { return IsText(member); });
+}
+
 std::string Unescape(std::string_view text) {
     const std::optional<std::string> plain = base::DecodeForm(text, base::BrokenEscape::kRefuse);
     if (!plain) {
         throw http::Failure(400, "a parameter holds a broken escape");
     }
-    if (!IsText(*plain)) {
+    if (!IsText(std::string_view(*plain))) {
         throw http::Failure(400, "a parameter is not UTF-8 text");
     }
     return *plain;
@@ -54,6 +68,9 @@ bool NamesMethod(const std::string& name) {
 }
 
 void Add(const std::string& name, Json::Value value, Parameters& parameters) {
+    if (!IsText(std::string_view(name)) || !IsText(value)) {
+        throw http::Failure(400, "a parameter is not UTF-8 text");
+    }
     const bool is_new = parameters.insert_or_assign(name, std::move(value)).second;
     if (!is_new && NamesMethod(name)) {
         throw http::Failure(400, "the parameter " + name + " is named twice");
@@ -84,7 +101,8 @@ Parameters ReadJson(const std::string& body) {
     const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
     Json::Value root;
     // The reader throws Json::Exception for a text that is nested too deep; that is answered like any wrong JSON.
-    if (!IsText(body) || !reader->parse(body.data(), body.data() + body.size(), &root, nullptr) || !root.isObject()) {
+    if (!IsText(std::string_view(body)) || !reader->parse(body.data(), body.data() + body.size(), &root, nullptr) ||
+        !root.isObject()) {
         throw http::Failure(400, "the body is not a JSON object");
     }
     Parameters parameters;

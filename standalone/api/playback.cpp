@@ -3,6 +3,7 @@
 // VEXO.Playback: steers a running player of the caller's session through its progress file and signals.
 #include <algorithm>
 #include <chrono>
+#include <functional>
 #include <thread>
 
 #include "standalone/api/own_apis.h"
@@ -18,18 +19,26 @@ constexpr int kMinRate = -8;
 constexpr std::chrono::milliseconds kSignalPoll{2};
 constexpr std::chrono::milliseconds kSignalLimit{1'000};
 
-// The slot of the player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such
-// player.
-control::Slot& PlayerSlot(const Call& call) {
+// The player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such player.
+control::SlotUse FindPlayer(const Call& call) {
     const std::int64_t key = call.NumberOr("timestamp", 0);
     if (key < 1) {
         throw Failure(400, "timestamp must be the number that the player was started with");
     }
-    control::Slot* slot = call.slots.FindPlayer(call.context.Session(), key);
-    if (slot == nullptr) {
+    const auto use = call.slots.FindPlayer(call.context.Session(), key);
+    if (!use) {
         throw Failure(404, "this session has no such player");
     }
-    return *slot;
+    return *use;
+}
+
+// As SlotTable::ChangePause. Throws Failure 404 when the player has ended.
+control::Pause ChangePause(const control::SlotUse& use, const std::function<void(control::Pause&)>& change) {
+    const auto before = control::SlotTable::ChangePause(use, change);
+    if (!before) {
+        throw Failure(404, "the player has ended");
+    }
+    return *before;
 }
 
 control::ProgressFile ProgressOf(const Call& call, const control::Player& player) {
@@ -41,7 +50,8 @@ control::ProgressFile ProgressOf(const Call& call, const control::Player& player
 }
 
 std::string SetRate(const Call& call) {
-    control::Player& player = PlayerSlot(call).player;
+    const control::SlotUse use = FindPlayer(call);
+    const control::Player& player = use.slot->player;
     const Json::Value& asked = call.Parameter("rate");
     const int rate = asked.isInt() ? asked.asInt() : 0;
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
@@ -50,8 +60,11 @@ std::string SetRate(const Call& call) {
     if (!player.takes_rate) {
         throw Failure(409, "this player does not take its rate from here");
     }
-    const bool waits = player.pause_requested && rate > 1;
-    player.resumed_rate = waits ? rate : 0;
+    bool waits = false;
+    ChangePause(use, [&waits, rate](control::Pause& pause) {
+        waits = pause.on && rate > 1;
+        pause.resumed_rate = waits ? rate : 0;
+    });
     if (!ProgressOf(call, player).Set(waits ? 1 : rate)) {
         throw Failure(409, "the player has been replaced");
     }
@@ -61,7 +74,7 @@ std::string SetRate(const Call& call) {
 }
 
 std::string GetPosition(const Call& call) {
-    const control::Player& player = PlayerSlot(call).player;
+    const control::Player& player = FindPlayer(call).slot->player;
     if (!player.tells_position) {
         throw Failure(409, "this player does not tell its position here");
     }
@@ -72,12 +85,11 @@ std::string GetPosition(const Call& call) {
 }
 
 // Waits until the host has told the player of its pause.
-void AwaitPause(const Call& call, const control::Slot& slot, bool on) {
+void AwaitPause(const Call& call, const control::SlotUse& use, bool on) {
     call.slots.Wake();
-    const std::uint64_t serial = slot.serial;
     const auto until = std::chrono::steady_clock::now() + kSignalLimit;
-    while (slot.player.paused != on) {
-        if (slot.serial != serial || std::chrono::steady_clock::now() > until) {
+    while (use.slot->player.paused != on) {
+        if (use.IsOver() || std::chrono::steady_clock::now() > until) {
             throw Failure(503, "the player was not reached in time");
         }
         std::this_thread::sleep_for(kSignalPoll);
@@ -85,8 +97,8 @@ void AwaitPause(const Call& call, const control::Slot& slot, bool on) {
 }
 
 std::string Pause(const Call& call) {
-    control::Slot& slot = PlayerSlot(call);
-    control::Player& player = slot.player;
+    const control::SlotUse use = FindPlayer(call);
+    const control::Player& player = use.slot->player;
     const Json::Value& asked = call.Parameter("on");
     if (!asked.isBool()) {
         throw Failure(400, "on must be true or false");
@@ -95,17 +107,23 @@ std::string Pause(const Call& call) {
     if (!player.can_pause) {
         throw Failure(409, "this player cannot be paused");
     }
+    int rate = 0;  // that it has before, if it must be slowed down
     if (on && player.takes_rate) {
         control::ProgressFile progress = ProgressOf(call, player);
-        if (const int rate = progress.Get(); rate > 1) {
-            player.resumed_rate = rate;
+        if (rate = progress.Get(); rate > 1) {
             progress.Set(1);
         }
     }
-    player.pause_requested = on;
-    AwaitPause(call, slot, on);
-    if (const int rate = on ? 0 : player.resumed_rate.exchange(0); rate != 0) {
-        ProgressOf(call, player).Set(rate);
+    ChangePause(use, [on, rate](control::Pause& pause) {
+        pause.on = on;
+        pause.resumed_rate = rate > 1 ? rate : pause.resumed_rate;
+    });
+    AwaitPause(call, use, on);
+    if (!on) {
+        const int resumed = ChangePause(use, [](control::Pause& pause) { pause.resumed_rate = 0; }).resumed_rate;
+        if (resumed != 0) {
+            ProgressOf(call, player).Set(resumed);
+        }
     }
     Json::Value data;
     data["on"] = on;
@@ -114,17 +132,17 @@ std::string Pause(const Call& call) {
 
 // Has a player that a newer one has replaced look at its file now.
 std::string CheckOwner(const Call& call) {
-    const control::Slot& slot = PlayerSlot(call);
+    const control::Slot* slot = FindPlayer(call).slot;
     const std::string& session = call.context.Session();
     const std::vector<control::Slot*> excess = call.slots.ExcessPlayers(session, control::ReadPlayerFile(session));
     call.slots.Wake();
     Json::Value data;
-    data["owner"] = std::find(excess.begin(), excess.end(), &slot) == excess.end();
+    data["owner"] = std::find(excess.begin(), excess.end(), slot) == excess.end();
     return SuccessAnswer(data);
 }
 
 std::string Stop(const Call& call) {
-    call.slots.End(PlayerSlot(call));
+    call.slots.End(FindPlayer(call));
     return SuccessAnswer(Json::nullValue);
 }
 

@@ -45,7 +45,7 @@ class Relay : public remote::LiveSink {
     // A viewer who has gone shows only where something is sent.
     bool GoesOn() override {
         pollfd viewer{STDOUT_FILENO, POLLRDHUP, 0};
-        return !call_.slot.must_end && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
+        return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
   private:

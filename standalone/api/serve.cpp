@@ -1,24 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/serve.h"
 
+#include <algorithm>
 #include <cstdio>
 
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
-#include "standalone/api/admit.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
+#include "standalone/http/body.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::api {
 
 namespace {
 
-constexpr rlim_t kMaxAddressSpace = rlim_t{1} << 30;
+constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
+constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
 constexpr std::size_t kMaxBodyWithoutSession = 4096;
 
 // Under a sanitizer a process maps terabytes before main.
@@ -28,16 +30,16 @@ constexpr bool kLimitAddressSpace = false;
 constexpr bool kLimitAddressSpace = true;
 #endif
 
-void LimitAddressSpace(bool limited) {
+void LimitAddressSpace(rlim_t max_bytes) {
     rlimit limit{};
     if (kLimitAddressSpace && ::getrlimit(RLIMIT_AS, &limit) == 0) {
-        limit.rlim_cur = limited && kMaxAddressSpace < limit.rlim_max ? kMaxAddressSpace : limit.rlim_max;
+        limit.rlim_cur = std::min(max_bytes, limit.rlim_max);
         ::setrlimit(RLIMIT_AS, &limit);
     }
 }
 
 // Cookie and session come first: nobody without a session may cost more than a short request.
-Call ReadCall(const http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+Call ReadCall(http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     Call call{.request = request,
               .api = {},
               .method = {},
@@ -48,9 +50,10 @@ Call ReadCall(const http::Request& request, control::SlotTable& slots, control::
               .slots = slots,
               .slot = slot};
     call.login = FindLogin(call);
-    if (!call.login && request.body.size() > kMaxBodyWithoutSession) {
+    if (!call.login && request.body.size() + request.unread_body_bytes > kMaxBodyWithoutSession) {
         throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401, "no session, and so only a short body");
     }
+    http::ReadBody(request, STDOUT_FILENO);
     AddBody(request, call.parameters);
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
@@ -102,8 +105,7 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
     }
 }
 
-std::string Serve(const Service& service, const http::Request& request, control::SlotTable& slots,
-                  control::Slot& slot) {
+std::string Serve(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     if (const std::string_view method = request.Header("REQUEST_METHOD"); method != "GET" && method != "POST") {
         throw Failure(405, "GET and POST only");
     }
@@ -113,8 +115,11 @@ std::string Serve(const Service& service, const http::Request& request, control:
     if (own == nullptr && entry == nullptr) {
         throw Failure(404, "no such api, version or method");
     }
+    if (LoadOf(call) == Load::kPictures) {
+        LimitAddressSpace(kMaxAddressSpaceForPictures);
+    }
     if (own == nullptr || own->needs_session) {
-        Admit(call, service.max_requests_per_session);
+        Admit(call, service.limits);
     }
     if (own != nullptr) {
         return RunMethod(*own, call);
@@ -125,7 +130,7 @@ std::string Serve(const Service& service, const http::Request& request, control:
     return RunModule(entry, call);
 }
 
-std::string ServeOrFail(const Service& service, const http::Request& request, control::SlotTable& slots,
+std::string ServeOrFail(const Service& service, http::Request& request, control::SlotTable& slots,
                         control::Slot& slot) {
     try {
         return Serve(service, request, slots, slot);
@@ -143,17 +148,17 @@ std::string ServeOrFail(const Service& service, const http::Request& request, co
 
 }  // namespace
 
-void ServeRequest(const Service& service, const http::Request& request, control::SlotTable& slots,
-                  control::Slot& slot) {
-    binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.must_end || slot.player.is_excess; });
-    LimitAddressSpace(true);
+void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+    binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.MustEnd() || slot.player.is_excess; });
+    LimitAddressSpace(kMaxAddressSpace);
     slot.pid = ::getpid();
     binding::RequestEvents events;
     events.on_stream = [&slot] {
         slot.is_stream = true;
-        LimitAddressSpace(false);
+        LimitAddressSpace(RLIM_INFINITY);
     };
     events.on_player = [&slots, &slot](std::int64_t key) { slots.BeginPlayer(slot, key); };
+    events.on_peer = [&service, &slots, &slot] { AdmitPeer(slots, slot, service.limits); };
     binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);
@@ -164,6 +169,7 @@ void ServeRequest(const Service& service, const http::Request& request, control:
     }
     // The host has the connection open too; the client should not wait for it.
     ::shutdown(STDOUT_FILENO, SHUT_WR);
+    http::DropBody(request, STDOUT_FILENO);
 }
 
 }  // namespace lookhaven::api

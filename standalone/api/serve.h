@@ -3,8 +3,7 @@
 // One request in its own process: read it, admit its caller, run the method, give the answer.
 #pragma once
 
-#include <cstddef>
-
+#include "standalone/api/admit.h"
 #include "standalone/api/modules.h"
 #include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
@@ -15,11 +14,11 @@ namespace lookhaven::api {
 struct Service {
     const base::Installation& installation;
     const Modules& modules;
-    std::size_t max_requests_per_session;
+    RequestLimits limits;
 };
 
-// Serves the request on standard output, which is its connection, and shuts that down for writing. Call it once in a
-// process: it sets the process's request context. Never throws for a request's sake.
-void ServeRequest(const Service& service, const http::Request& request, control::SlotTable& slots, control::Slot& slot);
+// Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down for
+// writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.
+void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot);
 
 }  // namespace lookhaven::api

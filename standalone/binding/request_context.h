@@ -29,6 +29,8 @@ struct RequestEvents {
     std::function<void()> on_stream = [] {};
     // The process plays recordings, reachable under the client's stream key; its player file is written.
     std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
+    // The caller has proved to be a paired host. May throw, which ends the request.
+    std::function<void()> on_peer = [] {};
 };
 
 class LH_PLATFORM_API RequestContext {
@@ -78,6 +80,7 @@ class LH_PLATFORM_API RequestContext {
     // The answer is a stream, which may run for as long as the client likes.
     void NoteStream();
     void NotePlayer(std::int64_t key) { events_.on_player(key); }
+    void NotePeer() { events_.on_peer(); }
     // The answer is a picture, alone or in a stream.
     void NotePicture() { wants_picture_ = true; }
     bool WantsPicture() const { return wants_picture_ || is_stream_; }

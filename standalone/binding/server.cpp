@@ -109,7 +109,7 @@ std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabl
 
 // A caller with a valid pair token is the paired host from here on, whatever session came along.
 bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
-    return OrFailure("IsAuthPairMatch", false, [&] {
+    const bool is_peer = OrFailure("IsAuthPairMatch", false, [&] {
         const std::int64_t now = UtcSeconds();
         bool matches = false;
         for (const std::string& secret : Servers().InboundPeerSecrets()) {
@@ -120,6 +120,10 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
         }
         return matches;
     });
+    if (is_peer) {
+        RequestContext::Current().NotePeer();
+    }
+    return is_peer;
 }
 
 SlaveHxAuthentication::SlaveHxAuthentication() = default;

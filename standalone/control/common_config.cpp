@@ -2,15 +2,12 @@
 #include "standalone/control/common_config.h"
 
 #include <array>
-#include <cerrno>
-#include <chrono>
 #include <filesystem>
-#include <memory>
 #include <optional>
 #include <system_error>
-#include <thread>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/shared_mutex.h"
 
 namespace lookhaven::control {
 
@@ -44,46 +41,16 @@ std::optional<Table> FindRecord(const std::filesystem::path& path) {
     return table && (*table)->boot == ThisBoot() ? std::move(table) : std::nullopt;
 }
 
-void InitMutex(pthread_mutex_t& mutex) {
-    pthread_mutexattr_t attributes;
-    pthread_mutexattr_init(&attributes);
-    pthread_mutexattr_setpshared(&attributes, PTHREAD_PROCESS_SHARED);
-    pthread_mutexattr_setrobust(&attributes, PTHREAD_MUTEX_ROBUST);
-    pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_ERRORCHECK);
-    const int error = pthread_mutex_init(&mutex, &attributes);
-    pthread_mutexattr_destroy(&attributes);
-    if (error != 0) {
-        throw std::system_error(error, std::generic_category(), "cannot make the common record's mutex");
-    }
-}
-
 Table FindOrMakeRecord(const std::filesystem::path& path) {
     const base::FileDescriptor lock = base::LockFile(path.string() + ".lock");
     if (std::optional<Table> table = FindRecord(path)) {
         return *std::move(table);
     }
     return Table::Replace(path, [](CommonConfigFile& file) {
-        InitMutex(file.config.mutex);
+        InitSharedMutex(file.config.mutex);
         file.config.timestamp_sec = MonotonicSeconds();
         file.boot = ThisBoot();
     });
-}
-
-struct Unlock {
-    void operator()(pthread_mutex_t* mutex) const { pthread_mutex_unlock(mutex); }
-};
-using Lock = std::unique_ptr<pthread_mutex_t, Unlock>;
-
-// Locks the record's mutex, also one whose owner died. Null after a second: others hold it for a few loads, so one that
-// is still held then belongs to a stopped process.
-Lock TryLock(pthread_mutex_t& mutex) {
-    int error = pthread_mutex_trylock(&mutex);
-    for (int tries = 1; error == EBUSY && tries < 1000; ++tries) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-        error = pthread_mutex_trylock(&mutex);
-    }
-    const bool is_held = error == 0 || (error == EOWNERDEAD && pthread_mutex_consistent(&mutex) == 0);
-    return Lock(is_held ? &mutex : nullptr);
 }
 
 }  // namespace
@@ -93,7 +60,7 @@ CommonConfigKeeper::CommonConfigKeeper(const base::Installation& installation)
 
 bool CommonConfigKeeper::Refresh(bool paused) {
     CommonConfig& config = table_->config;
-    const Lock lock = TryLock(config.mutex);
+    const SharedLock lock = TryLock(config.mutex);
     if (!lock) {
         return false;
     }
@@ -110,7 +77,7 @@ CommonConfig* MapCommonConfig(const base::Installation& installation) try {
 }
 
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec) {
-    const Lock lock = TryLock(config.mutex);
+    const SharedLock lock = TryLock(config.mutex);
     return lock && MonotonicSeconds() - config.timestamp_sec <= max_age_sec;
 }
 

@@ -10,10 +10,19 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/control/shared_mutex.h"
 
 namespace lookhaven::control {
 
+// The slots behind it are aligned as well.
+struct alignas(Slot) SlotTable::Guard {
+    pthread_mutex_t mutex;
+};
+
 namespace {
+
+// A pause in one word: the serial above, then the rate in 8 bits, then whether it is on.
+constexpr int kSerialShift = 9;
 
 bool IsPlayerOf(const Slot& slot, std::string_view session) {
     return slot.serial != 0 && slot.player.started_us != 0 && SessionOf(slot) == session;
@@ -22,35 +31,39 @@ bool IsPlayerOf(const Slot& slot, std::string_view session) {
 }  // namespace
 
 SlotTable::SlotTable(std::size_t slots) : wake_(::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)) {
-    void* memory = ::mmap(nullptr, slots * sizeof(Slot), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+    const std::size_t size_bytes = sizeof(Guard) + slots * sizeof(Slot);
+    void* memory = ::mmap(nullptr, size_bytes, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
     if (memory == MAP_FAILED || !wake_) {
         base::ThrowErrno("cannot make the table of requests");
     }
-    slots_ = {static_cast<Slot*>(memory), slots};
+    guard_ = new (memory) Guard{};
+    InitSharedMutex(guard_->mutex);
+    slots_ = {reinterpret_cast<Slot*>(guard_ + 1), slots};
     for (Slot& slot : slots_) {
         new (&slot) Slot{};
     }
 }
 
 SlotTable::~SlotTable() {
-    ::munmap(slots_.data(), slots_.size_bytes());
+    ::munmap(guard_, sizeof(Guard) + slots_.size_bytes());
 }
 
-Slot* SlotTable::Take() {
-    const auto slot = std::find_if(slots_.begin(), slots_.end(), [](const Slot& each) { return each.serial == 0; });
-    if (slot == slots_.end()) {
+Slot* SlotTable::Take(std::size_t keep_free) {
+    const auto is_free = [](const Slot& each) { return each.serial == 0; };
+    const auto slot = std::find_if(slots_.begin(), slots_.end(), is_free);
+    if (std::count_if(slot, slots_.end(), is_free) <= static_cast<std::ptrdiff_t>(keep_free)) {
         return nullptr;
     }
     slot->is_stream = false;
     slot->has_session = false;
-    slot->must_end = false;
     slot->pid = 0;
+    slot->user = 0;
+    slot->work = Work::kNone;
     slot->player.started_us = 0;
     slot->player.is_excess = false;
-    slot->player.pause_requested = false;
     slot->player.paused = false;
-    slot->player.resumed_rate = 0;
-    slot->serial = ++last_serial_;
+    slot->player.pause = PackPause(++last_serial_, {});
+    slot->serial = last_serial_;
     return &*slot;
 }
 
@@ -63,35 +76,76 @@ void SlotTable::SetSession(Slot& slot, std::string_view handle) {
     slot.has_session = true;
 }
 
-std::size_t SlotTable::OlderRequests(const Slot& slot) const {
+std::size_t SlotTable::CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const {
     return static_cast<std::size_t>(std::count_if(slots_.begin(), slots_.end(), [&](const Slot& each) {
-        const std::uint64_t serial = each.serial;
-        return serial != 0 && serial < slot.serial && SessionOf(each) == SessionOf(slot);
+        return &each != &slot && each.serial != 0 && counts(each);
     }));
+}
+
+Admission SlotTable::Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    if (!lock || CountOthers(slot, [](const Slot& each) { return each.user != 0; }) >= max_in_all) {
+        return Admission::kTooMany;
+    }
+    if (CountOthers(slot, [user](const Slot& each) { return each.user == user; }) >= max_of_user) {
+        return Admission::kTooManyOfUser;
+    }
+    slot.user = user;
+    return Admission::kGranted;
+}
+
+bool SlotTable::BeginSearch(Slot& slot, std::size_t max_of_user) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    const auto counts = [user = slot.user.load()](const Slot& each) {
+        return each.work == Work::kSearch && each.user == user && !each.is_stream;
+    };
+    if (!lock || CountOthers(slot, counts) >= max_of_user) {
+        return false;
+    }
+    slot.work = Work::kSearch;
+    return true;
+}
+
+bool SlotTable::BeginHashing(Slot& slot, std::size_t max_in_all) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    if (!lock || CountOthers(slot, [](const Slot& each) { return each.work == Work::kHashing; }) >= max_in_all) {
+        return false;
+    }
+    slot.work = Work::kHashing;
+    return true;
 }
 
 std::set<std::string> SlotTable::Sessions() const {
     std::set<std::string> sessions;
     for (const Slot& slot : slots_) {
-        if (slot.serial != 0 && slot.has_session && !slot.must_end) {
+        if (slot.serial != 0 && slot.has_session && !slot.MustEnd()) {
             sessions.emplace(SessionOf(slot));
         }
     }
     return sessions;
 }
 
+// The serial is read before the session: of a slot that is taken anew in between, the old one is marked.
 void SlotTable::EndSession(std::string_view handle) {
     for (Slot& slot : slots_) {
-        if (slot.serial != 0 && SessionOf(slot) == handle) {
-            slot.must_end = true;
+        const SlotUse use{&slot, slot.serial};
+        if (use.serial != 0 && SessionOf(slot) == handle) {
+            MarkEnded(use);
         }
     }
     Wake();
 }
 
-void SlotTable::End(Slot& slot) {
-    slot.must_end = true;
+void SlotTable::End(const SlotUse& use) {
+    MarkEnded(use);
     Wake();
+}
+
+// Serials grow, so a mark that comes late takes no newer one away.
+void SlotTable::MarkEnded(const SlotUse& use) {
+    std::uint64_t marked = use.slot->ended;
+    while (marked < use.serial && !use.slot->ended.compare_exchange_weak(marked, use.serial)) {
+    }
 }
 
 void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
@@ -100,15 +154,38 @@ void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
     Wake();
 }
 
-Slot* SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
-    Slot* found = nullptr;
+std::optional<SlotUse> SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
+    std::optional<SlotUse> found;
     for (Slot& slot : slots_) {
+        const SlotUse use{&slot, slot.serial};
         if (IsPlayerOf(slot, session) && slot.player.key == key &&
-            (found == nullptr || slot.player.started_us > found->player.started_us)) {
-            found = &slot;
+            (!found || slot.player.started_us > found->slot->player.started_us)) {
+            found = use;
         }
     }
     return found;
+}
+
+std::uint64_t SlotTable::PackPause(std::uint64_t serial, const Pause& pause) {
+    const auto rate = static_cast<std::uint8_t>(pause.resumed_rate);
+    return serial << kSerialShift | std::uint64_t{rate} << 1 | (pause.on ? 1U : 0U);
+}
+
+Pause SlotTable::UnpackPause(std::uint64_t word) {
+    return {(word & 1) != 0, static_cast<std::int8_t>(word >> 1 & 0xff)};
+}
+
+std::optional<Pause> SlotTable::ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change) {
+    std::atomic<std::uint64_t>& word = player.slot->player.pause;
+    for (std::uint64_t held = word; held >> kSerialShift == player.serial;) {
+        const Pause before = UnpackPause(held);
+        Pause after = before;
+        change(after);
+        if (word.compare_exchange_weak(held, PackPause(player.serial, after))) {
+            return before;
+        }
+    }
+    return std::nullopt;
 }
 
 std::set<std::string> SlotTable::SessionsWithPlayers() const {

@@ -8,13 +8,19 @@
 //               (2) A session handle is written once per use of a slot, before has_session is set; what a player can
 //                   do, before started_us is set.
 //               (3) Other requests only store what they request of a player; only the host signals it.
-// Thread safety Any process.
+//               (4) What one request stores for another carries the serial of the request that it is meant for, so it
+//                   never reaches a later one in the same slot.
+//               (5) What a request occupies is noted in its slot alone, so it is given back when the process ends,
+//                   however it ends.
+// Thread safety Any process. The host never waits for the mutex.
 #pragma once
 
 #include <array>
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
+#include <optional>
 #include <set>
 #include <span>
 #include <string>
@@ -27,6 +33,12 @@
 
 namespace lookhaven::control {
 
+// What is requested of a player's pause.
+struct Pause {
+    bool on = false;
+    int resumed_rate = 0;  // -128 … 127, to be set when the pause ends; 0: none
+};
+
 // A request process that plays recordings.
 struct Player {
     std::atomic<std::int64_t> started_us;  // monotonic, once its player file is written; 0: no player
@@ -36,19 +48,40 @@ struct Player {
     bool can_pause;                        // at rate 1 and slower
     int max_players;                       // of its session at the same time
     std::atomic<bool> is_excess;           // newer ones have taken its place: it is to end
-    std::atomic<bool> pause_requested;
-    std::atomic<bool> paused;       // the host has signalled it
-    std::atomic<int> resumed_rate;  // to be set when the pause ends; 0: none
+    std::atomic<std::uint64_t> pause;      // a Pause with the serial of the request that it is meant for
+    std::atomic<bool> paused;              // the host has signalled it
 };
+
+// Costly work of which only so much is done at once.
+enum class Work : std::uint8_t {
+    kNone,
+    kSearch,   // may take seconds of a processor
+    kHashing,  // of a password, in 64 MiB
+};
+
+enum class Admission { kGranted, kTooManyOfUser, kTooMany };
 
 struct Slot {
     std::atomic<std::uint64_t> serial;  // grows with each request; 0: free
+    std::atomic<std::uint64_t> ended;   // serial of the last request here that must end, since its session, player or
+                                        // client is gone
     std::atomic<bool> is_stream;
     std::atomic<bool> has_session;
-    std::atomic<bool> must_end;  // session, player or client is gone: the process must end
     std::atomic<pid_t> pid;
+    std::atomic<int> user;  // whose request was admitted; 0: none yet
+    std::atomic<Work> work;
     std::array<char, 64> session;
     Player player;
+
+    bool MustEnd() const { return ended == serial; }
+};
+
+// One request in its slot; the slot may be free, or serve another one, at any time.
+struct SlotUse {
+    Slot* slot;
+    std::uint64_t serial;
+
+    bool IsOver() const { return slot->serial != serial; }
 };
 
 class SlotTable {
@@ -59,15 +92,23 @@ class SlotTable {
     SlotTable& operator=(const SlotTable&) = delete;
     ~SlotTable();
 
-    // For the host: a slot for a new request, null when all are taken.
-    Slot* Take();
+    // For the host: a slot for a new request, null when no more than that many are free.
+    Slot* Take(std::size_t keep_free = 0);
     static void Free(Slot& slot) { slot.serial = 0; }
 
     // For a request process: sets the session of its slot. Throws std::length_error for a handle that is too long.
     static void SetSession(Slot& slot, std::string_view handle);
-    // How many requests of the slot's session began before it and still run. Of two that start at once, only the
-    // younger counts the other.
-    std::size_t OlderRequests(const Slot& slot) const;
+
+    // For a request process, three ways to occupy something, each in one step among all processes: however many try at
+    // once, no more than the limit succeed.
+    //
+    // The request is the user's from here on. Counted are admitted requests.
+    Admission Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all);
+    // One of its user's searches, until the process ends or its answer turns out to be a stream. False: no room.
+    bool BeginSearch(Slot& slot, std::size_t max_of_user);
+    // Until EndWork. False: no room.
+    bool BeginHashing(Slot& slot, std::size_t max_in_all);
+    static void EndWork(Slot& slot) { slot.work = Work::kNone; }
 
     // The sessions of running requests, unless they must end anyway.
     std::set<std::string> Sessions() const;
@@ -76,16 +117,22 @@ class SlotTable {
 
     // For a request process: from now on it is a player, and older players of the session may have to end.
     void BeginPlayer(Slot& slot, std::int64_t key);
-    // The session's newest player under the key; null when there is none.
-    Slot* FindPlayer(std::string_view session, std::int64_t key) const;
+    // The session's newest player under the key.
+    std::optional<SlotUse> FindPlayer(std::string_view session, std::int64_t key) const;
+    // Lets change alter what is requested of the player, in one step, which may call it several times; returns what it
+    // was before. Nothing when the player's request is over.
+    static std::optional<Pause> ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change);
+    static Pause PauseOf(const Slot& slot) { return UnpackPause(slot.player.pause); }
     std::set<std::string> SessionsWithPlayers() const;
     // The players that must end once the session's player file names that process: all others but the newest, as many
     // as its limit leaves. None when the process is not one of the session.
     std::vector<Slot*> ExcessPlayers(std::string_view session, pid_t newest) const;
     // Makes the host look at its players and at the processes that must end.
     void Wake();
-    // Marks one request as to end and wakes the host.
-    void End(Slot& slot);
+    // Marks one request as to end and wakes the host; does nothing when it is over.
+    void End(const SlotUse& use);
+    // The same without waking the host, for the host.
+    static void MarkEnded(const SlotUse& use);
 
     // Readable after Wake, until ClearWake.
     int WakeDescriptor() const { return wake_.Get(); }
@@ -94,6 +141,15 @@ class SlotTable {
     void SetWakeDescriptor(int descriptor);
 
   private:
+    struct Guard;
+
+    static std::uint64_t PackPause(std::uint64_t serial, const Pause& pause);
+    static Pause UnpackPause(std::uint64_t word);
+
+    // How many other requests there are that count.
+    std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;
+
+    Guard* guard_;  // makes counting and occupying one step; in memory before the slots
     std::span<Slot> slots_;
     std::uint64_t last_serial_ = 0;
     base::FileDescriptor wake_;

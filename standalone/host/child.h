@@ -15,7 +15,7 @@ namespace lookhaven::host {
 // The work of the host's child processes, given by the program. Each runs in a process of its own after LeaveHost.
 struct ChildWork {
     // Answers the request on standard output.
-    std::function<void(const http::Request&, control::SlotTable&, control::Slot&)> serve_request;
+    std::function<void(http::Request&, control::SlotTable&, control::Slot&)> serve_request;
     // Marks the slots whose session has ended elsewhere, again and again; does not return.
     std::function<void(control::SlotTable&)> watch_sessions;
 };

@@ -79,7 +79,7 @@ void ProcessTable::EndAll() {
 
 void ProcessTable::EndMarked() {
     for (auto& [pid, process] : processes_) {
-        if (process.slot->must_end) {
+        if (process.slot->MustEnd()) {
             BeginEnding(process);
         }
     }
@@ -88,7 +88,7 @@ void ProcessTable::EndMarked() {
 void ProcessTable::BeginEnding(Process& process) {
     if (!process.ending_since) {
         process.ending_since = process.next_signal = Clock::now();
-        process.slot->must_end = true;
+        control::SlotTable::MarkEnded({process.slot, process.slot->serial});
     }
 }
 
@@ -136,7 +136,7 @@ bool ProcessTable::SignalPauses() {
     bool again = false;
     for (auto& [pid, process] : processes_) {
         control::Player& player = process.slot->player;
-        if (player.started_us == 0 || player.pause_requested == player.paused) {
+        if (player.started_us == 0 || control::SlotTable::PauseOf(*process.slot).on == player.paused) {
             continue;
         }
         if (IsPending(pid, SIGUSR2)) {

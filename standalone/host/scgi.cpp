@@ -23,6 +23,10 @@ ScgiParser::State ScgiParser::Feed(std::string_view bytes) {
     if (state_ == State::kComplete && !bytes.empty()) {
         Fail("the request goes on behind its body");
     }
+    if (state_ == State::kIncomplete && place_ == Place::kBody && body_bytes_ > kMaxAwaitedBodyBytes) {
+        request_.unread_body_bytes = body_bytes_ - request_.body.size();
+        state_ = State::kComplete;
+    }
     return state_;
 }
 

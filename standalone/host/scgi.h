@@ -3,7 +3,8 @@
 // Parses one SCGI request as its bytes arrive.
 //
 // Format        <decimal length>:<name> NUL <value> NUL … ,<body>. The first name is CONTENT_LENGTH, and SCGI is "1".
-// Invariants    (1) Never keeps more than the two limits and one chunk, whatever a client sends.
+//               A large body is not waited for: who may send one, the request's process finds out before it reads it.
+// Invariants    (1) Never keeps more than the head, a small body and one chunk, whatever a client sends.
 //               (2) Complete and malformed are final.
 #pragma once
 
@@ -21,8 +22,10 @@ class ScgiParser {
 
     static constexpr std::size_t kMaxHeadBytes = 8 * 1024;
     static constexpr std::size_t kMaxBodyBytes = 1024 * 1024;
+    static constexpr std::size_t kMaxAwaitedBodyBytes = 4096;
 
-    // Bytes behind the body make a request malformed.
+    // A request is complete once its body is, or its head where the body is large: the rest stays unread. Bytes behind
+    // an awaited body make a request malformed.
     State Feed(std::string_view bytes);
     // What is wrong, for the client; empty unless malformed.
     std::string_view Problem() const { return problem_; }

@@ -23,6 +23,7 @@ namespace {
 constexpr std::chrono::seconds kRefusalLingers{1};
 constexpr std::chrono::seconds kWatcherRestart{1};
 constexpr std::chrono::milliseconds kAcceptAgain{200};
+constexpr int kRetryAfterSeconds = 1;
 
 int MillisUntil(Clock::time_point due) {
     if (due == Clock::time_point::max()) {
@@ -31,6 +32,12 @@ int MillisUntil(Clock::time_point due) {
     return static_cast<int>(
         std::max(std::chrono::ceil<std::chrono::milliseconds>(due - Clock::now()), std::chrono::milliseconds{0})
             .count());
+}
+
+// Not exact, and need not be: the web server lets through few POSTs that name this api.
+bool LooksLikeLogIn(const http::Request& request) {
+    return request.Header("REQUEST_METHOD") == "POST" &&
+           request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
 }
 
 base::FileDescriptor BlockSignals() {
@@ -162,7 +169,8 @@ void Server::Read(int socket) {
 // The connection stays open for a moment and its further bytes are dropped: closing at once would reset it, and the
 // client might lose the answer.
 void Server::Refuse(Connection& connection, int status, const std::string& message) {
-    const std::string answer = http::FailureAnswer(http::Failure(status, message));
+    const std::string answer =
+        http::FailureAnswer(http::Failure(status, message, status == 503 ? kRetryAfterSeconds : 0));
     ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
     ::shutdown(connection.socket.Get(), SHUT_WR);
     connection.refused = true;
@@ -171,11 +179,15 @@ void Server::Refuse(Connection& connection, int status, const std::string& messa
 
 void Server::StartRequest(Connection connection) {
     const int number = connection.socket.Get();
-    control::Slot* slot = slots_.Take();
+    http::Request request = connection.parser.TakeRequest();
+    if (request.unread_body_bytes > 0 && request.Header("HTTP_COOKIE").empty()) {
+        return Refuse(connections_[number] = std::move(connection), LooksLikeLogIn(request) ? 413 : 401,
+                      "no session, and so only a short body");
+    }
+    control::Slot* slot = slots_.Take(LooksLikeLogIn(request) ? 0 : limits_.kept_for_log_in);
     if (slot == nullptr) {
         return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
     }
-    const http::Request request = connection.parser.TakeRequest();
     const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {
         LeaveHost(host, slots_, number);
         work_.serve_request(request, slots_, *slot);

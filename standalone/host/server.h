@@ -23,7 +23,8 @@
 namespace lookhaven::host {
 
 struct ServerLimits {
-    std::size_t requests = 256;              // running at once
+    std::size_t requests = 256;              // running at once …
+    std::size_t kept_for_log_in = 0;         // … of them
     std::chrono::milliseconds read{10'000};  // from accepting a connection to the request's last byte
     ProcessLimits processes;
 };

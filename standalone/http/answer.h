@@ -11,11 +11,17 @@ namespace lookhaven::http {
 // A failure that the client is told: HTTP status, which is the answer's code too, and a message without secrets.
 class Failure : public std::runtime_error {
   public:
-    Failure(int status, const std::string& message) : std::runtime_error(message), status_(status) {}
+    // retry_after_s: when the client may succeed; 0 where waiting does not help.
+    Failure(int status, const std::string& message, int retry_after_s = 0)
+        : std::runtime_error(message),
+          status_(status),
+          retry_after_s_(retry_after_s) {}
     int Status() const { return status_; }
+    int RetryAfterSeconds() const { return retry_after_s_; }
 
   private:
     int status_;
+    int retry_after_s_;
 };
 
 // The whole answer with a body of JSON. extra: further header lines, each ending in CR LF.

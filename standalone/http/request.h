@@ -3,6 +3,7 @@
 // One HTTP request as the web server hands it on.
 #pragma once
 
+#include <cstddef>
 #include <map>
 #include <string>
 #include <string_view>
@@ -13,6 +14,7 @@ struct Request {
     // By their CGI names: REQUEST_METHOD, QUERY_STRING, HTTP_COOKIE …
     std::map<std::string, std::string, std::less<>> headers;
     std::string body;
+    std::size_t unread_body_bytes = 0;  // of the body, still on the connection; see body.h
 
     // The header's value, borrowed from the request; empty when it is missing.
     std::string_view Header(std::string_view name) const;

@@ -52,6 +52,11 @@ NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::
                           Digest(session.secret), session.handle, now_s, now_s, EndOf(lifetime_, now_s, now_s), user_id,
                           any_password ? std::string() : *password_hash, any_password);
         Require(found, "account", user_id);
+        Execute(sql,
+                "delete from sessions where user_id = :user and handle <> :new and (expires <= :now or handle not in"
+                " (select handle from sessions where user_id = :owner and handle <> :newest and expires > :now_too"
+                " order by created desc, handle limit :others))",
+                user_id, session.handle, now_s, user_id, session.handle, now_s, kMaxPerUser - 1);
     });
     return session;
 }

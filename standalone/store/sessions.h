@@ -43,6 +43,9 @@ class Sessions {
         : connection_(store.connection()),
           lifetime_(lifetime) {}
 
+    // A user has at most that many sessions: the oldest end.
+    static constexpr int kMaxPerUser = 64;
+
     // Throws NotFound for an unknown user.
     NewSession Create(int user_id, std::int64_t now_s);
     // The same at a log-in. Throws NotFound too when the password has changed since it was checked, for that change

@@ -32,7 +32,7 @@ struct Options {
     std::string socket;
     std::vector<std::string> modules;
     host::ServerLimits limits;
-    std::size_t max_requests_per_session = 64;
+    api::RequestLimits requests;
 };
 
 void AddMillis(CLI::App& app, const char* name, std::chrono::milliseconds& value, const char* text) {
@@ -50,11 +50,21 @@ void Describe(CLI::App& app, Options& options) {
     app.add_option("--socket", options.socket, "unix socket to listen on (run/webapi.sock in the state folder)");
     app.add_option("--module", options.modules, "web API module to serve; may be given several times");
     app.add_option("--max-requests", options.limits.requests, "requests running at once")->check(CLI::Range(1, 4096));
-    app.add_option("--max-requests-per-session", options.max_requests_per_session, "of them, of one session")
+    app.add_option("--max-requests-per-user", options.requests.per_user, "of them, of one account")
+        ->check(CLI::Range(1, 4096));
+    app.add_option("--max-searches-per-user", options.requests.searches_per_user,
+                   "of an account's, searches; more wait")
         ->check(CLI::Range(1, 4096));
     AddMillis(app, "--read-seconds", options.limits.read, "for a request to arrive");
     AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is no stream");
     AddMillis(app, "--leave-seconds", options.limits.processes.leave, "for a process that was told to end");
+}
+
+// A part of the requests is kept for log-ins, and another for managers: whatever viewers do, an owner gets in.
+void KeepSome(Options& options) {
+    const std::size_t requests = options.limits.requests;
+    options.limits.kept_for_log_in = requests / 32;
+    options.requests.but_managers = requests - requests / 32 - requests / 16;
 }
 
 void Run(const Options& options) {
@@ -67,9 +77,9 @@ void Run(const Options& options) {
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
-    const api::Service service{installation, modules, options.max_requests_per_session};
+    const api::Service service{installation, modules, options.requests};
     const host::ChildWork work{
-        .serve_request = [&service](const http::Request& request, control::SlotTable& slots,
+        .serve_request = [&service](http::Request& request, control::SlotTable& slots,
                                     control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },
         .watch_sessions = [&installation](control::SlotTable& slots) { api::WatchSessions(installation, slots); }};
     host::Server server(installation, work, listener.TakeSocket(), options.limits);
@@ -86,6 +96,7 @@ int main(int count, char** arguments) {
     CLI::App app("Hosts web API modules behind a web server that speaks SCGI.");
     Describe(app, options);
     CLI11_PARSE(app, count, arguments);
+    KeepSome(options);
     try {
         Run(options);
     } catch (const std::exception& error) {

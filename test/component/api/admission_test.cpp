@@ -1,15 +1,23 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Who may call, and what a caller without a session or with narrowed rights is refused: each row is an attack.
+#include <algorithm>
+#include <array>
 #include <string>
+#include <vector>
 
 #include <gtest/gtest.h>
+#include <sys/socket.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/binding/pair_token.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/users.h"
 #include "test/support/host/host_under_test.h"
+#include "test/support/host/scgi_bytes.h"
 
 namespace lookhaven::api {
 
@@ -52,6 +60,76 @@ TEST_F(Admission, OnlyASessionMayCostMuch) {
     EXPECT_EQ(Status(success, false, large), 401);
     EXPECT_EQ(Status("api=VEXO.Auth&version=1&method=Login", false, large), 413);
     EXPECT_EQ(Status(success, true, "p=" + large.substr(2)), 200);
+    const std::string promise = ScgiBytes({{"REQUEST_METHOD", "POST"}, {"QUERY_STRING", success}}, large);
+    EXPECT_EQ(host_.Exchange(promise.substr(0, promise.size() - large.size())).status, 401) << "a body is not awaited";
+}
+
+TEST_F(Admission, FewPasswordsAreHashedAtOnce) {
+    const std::string login = "api=VEXO.Auth&version=1&method=Login";
+    const auto attempt = [&](int number) {
+        base::FileDescriptor connection = host_.Connect();
+        const std::string bytes = ScgiBytes({{"REQUEST_METHOD", "POST"},
+                                             {"QUERY_STRING", login},
+                                             {"CONTENT_TYPE", "application/x-www-form-urlencoded"}},
+                                            "password=wrong&account=a" + std::to_string(number));
+        send(connection.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
+        return connection;
+    };
+    std::vector<base::FileDescriptor> attempts(40);
+    std::ranges::generate(attempts, [&, n = 0]() mutable { return attempt(++n); });
+    int refused = 0;
+    for (const base::FileDescriptor& each : attempts) {
+        const host::Answer answer = HostUnderTest::ReadAnswer(each);
+        EXPECT_TRUE(answer.status == 401 || answer.status == 503) << answer.body;
+        EXPECT_EQ(answer.headers.count("Retry-After"), answer.status == 503 ? 1U : 0U);
+        refused += answer.status == 503 ? 1 : 0;
+    }
+    EXPECT_GT(refused, 0);
+    std::ranges::generate(attempts, [&, n = 100]() mutable { return attempt(++n); });
+    attempts.clear();
+    EXPECT_TRUE(host::Eventually(std::chrono::seconds(3), [&] { return host_.RequestProcesses() == 0; }));
+    EXPECT_EQ(Status(login, false, "account=admin&password=right+password"), 200) << "what was cut off gives way";
+}
+
+TEST_F(Admission, LogInsAndRefusalsAreLoggedCleanly) {
+    const std::string login = "api=VEXO.Auth&version=1&method=Login";
+    const HostUnderTest::Headers from{{"REMOTE_ADDR", "2001:db8::9"}};
+    EXPECT_EQ(Status(login, false, "account=ADMIN&password=right+password", from), 200);
+    const std::string forged = "x%22+from+%22::1%22%0A%1B%5B2J%C2%9B%7F" + std::string(500, 'y');
+    EXPECT_EQ(Status(login, false, "password=wrong&account=" + forged, from), 401);
+    const auto line = [this](const char* file) {
+        return base::ReadFile(host_.Home().LogFolder() / file).substr(std::string("2026-01-01T00:00:00.000Z ").size());
+    };
+    EXPECT_EQ(line("log-ins.log"), "\"admin\" from \"2001:db8::9\": logged in\n");
+    const std::string refusal = line("refused-log-ins.log");
+    EXPECT_TRUE(refusal.starts_with(R"("x\" from \"::1\"\n\u001b[2J\u009b yyy)")) << refusal;
+    EXPECT_TRUE(refusal.ends_with("y\" from \"2001:db8::9\": wrong account or password\n")) << refusal;
+    EXPECT_LT(refusal.size(), 160U);
+}
+
+TEST(Peers, AreOneUserTogether) {
+    const HostUnderTest host({"--max-requests-per-user", "2"});
+    store::Store records = store::Store::Open(host.Home().StoreUrl());
+    const std::string now = std::to_string(base::WallMillis() / 1000);
+    std::vector<base::FileDescriptor> running;
+    const auto open = [&](const std::string& secret) {
+        return host.OpenQuery("api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=PeerStream&timestamp=" + now +
+                                  "&cookie=" + binding::MakePairToken(secret, now),
+                              "");
+    };
+    store::RecordingServer peer;
+    for (const std::string& secret : {std::string(64, 'a'), std::string(64, 'b')}) {
+        peer.name = "Peer " + secret.substr(0, 1);
+        store::RecordingServers(records).Add(peer, secret);
+        running.push_back(open(secret));
+    }
+    ASSERT_TRUE(host::Eventually(std::chrono::seconds(2), [&] { return host.RequestProcesses() == 2; }));
+    std::array<char, 8> begun{};
+    for (const base::FileDescriptor& each : running) {
+        EXPECT_GT(recv(each.Get(), begun.data(), begun.size(), 0), 0);
+    }
+    EXPECT_EQ(HostUnderTest::ReadAnswer(open(std::string(64, 'b'))).status, 503);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
 }
 
 TEST_F(Admission, AStoreThatCannotBeWrittenStillServesWhoIsLoggedIn) {

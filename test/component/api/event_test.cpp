@@ -70,8 +70,12 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
 
 TEST_F(EventApi, RefusesBadInput) {
     const std::string late = std::to_string(base::WallMillis() / 1000 + 7200);
+    std::string many;
+    for (int id = 1; id <= 1001; ++id) {
+        many += std::to_string(id) + ",";
+    }
     const struct {
-        const char* query;
+        std::string query;
         std::string form;  // empty: a GET
         int status;
         bool as_viewer = false;
@@ -100,6 +104,8 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=List&limit=10001", "", 400},
         {"Event&version=1&method=List&offset=-1", "", 400},
         {"Event&version=1&method=List&offset=99999999999", "", 400},
+        {"Event&version=1&method=List&offset=100001", "", 400},
+        {"Event&version=1&method=List&cameralists=" + many, "", 400},
         {"Event&version=1&method=List&kind=all", "", 400},
         {"Event&version=1&method=List&from=now", "", 400},
         {"Event&version=1&method=Download", "", 404},

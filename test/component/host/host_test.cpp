@@ -176,15 +176,17 @@ TEST(Host, EndsProcessesWhoseClientLeft) {
     }
 }
 
-TEST(Host, LimitsRequestsInAllAndPerSession) {
-    const HostUnderTest host({"--max-requests", "5", "--max-requests-per-session", "3"});
+TEST(Host, LimitsRequestsInAllAndPerUser) {
+    const HostUnderTest host({"--max-requests", "5", "--max-requests-per-user", "3"});
     const std::string admin = host.LogIn().secret;
     const std::string guest = host.LogIn("guest").secret;
     std::vector<base::FileDescriptor> running;
     for (int i = 0; i < 3; ++i) {
-        running.push_back(OpenStream(host, admin));
+        running.push_back(OpenStream(host, host.LogIn().secret));
     }
-    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 503);
+    const Answer refused = host.Ask("api=Test&version=1&method=Success", admin);
+    EXPECT_EQ(refused.status, 503) << "however many sessions";
+    EXPECT_EQ(refused.headers.count("Retry-After"), 1U);
     // An answered request counts until its process is gone.
     ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 3; }));
     running.push_back(OpenStream(host, guest));
@@ -195,6 +197,40 @@ TEST(Host, LimitsRequestsInAllAndPerSession) {
     running.clear();
     EXPECT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", admin).status, 200);
+}
+
+TEST(Host, KeepsRoomForOwnerAndLogInWhateverAViewerOpens) {
+    const HostUnderTest host({"--max-requests", "32", "--max-requests-per-user", "64"});
+    const std::string guest = host.LogIn("guest").secret;
+    const std::string admin = host.LogIn().secret;
+    const std::string success = "api=Test&version=1&method=Success";
+    std::vector<base::FileDescriptor> running;
+    for (int i = 0; i < 29; ++i) {
+        running.push_back(OpenStream(host, guest));
+    }
+    EXPECT_EQ(host.Ask(success, guest).status, 503);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 29; }));
+    running.push_back(OpenStream(host, admin));
+    running.push_back(OpenStream(host, admin));
+    EXPECT_EQ(host.Ask(success, admin).status, 503);
+    EXPECT_EQ(host.Ask("api=VEXO.Auth&version=1&method=Login", "", {}, "account=admin&password=right+password").status,
+              200);
+}
+
+TEST(Host, RunsFewSearchesOfAUserAtOnce) {
+    const HostUnderTest host({"--max-searches-per-user", "2"});
+    const std::string guest = host.LogIn("guest").secret;
+    base::FileDescriptor first = host.Open("Hang", guest);
+    const base::FileDescriptor second = host.Open("Hang", host.LogIn("guest").secret);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 2; }));
+    const base::FileDescriptor stream = OpenStream(host, host.LogIn().secret);
+    const base::FileDescriptor waiting = host.Open("Success", guest);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 4; }));
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200) << "another's search";
+    std::array<char, 1> byte{};
+    EXPECT_EQ(recv(waiting.Get(), byte.data(), byte.size(), MSG_DONTWAIT), -1);
+    first.Reset();
+    EXPECT_EQ(HostUnderTest::ReadAnswer(waiting).status, 200);
 }
 
 TEST(Host, LimitsTimeAndMemoryOfWhatDoesNotStream) {

@@ -167,6 +167,18 @@ TEST_P(AccountTest, ASessionOpensBySecretAloneAndTheStoreDoesNotHoldIt) {
     EXPECT_THAT(sessions_.EndedAmong({made.handle, second.handle}, kNow), ElementsAre(made.handle));
 }
 
+TEST_P(AccountTest, AUserHasSoManySessionsAndTheOldestEnds) {
+    const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
+    const NewSession other = sessions_.Create(users_.Add("eve", kPassword, Privilege::kViewer).id, kNow - 100);
+    std::vector<std::string> handles{sessions_.Create(id, kNow - 1).handle};
+    for (int i = 1; i <= Sessions::kMaxPerUser; ++i) {
+        EXPECT_THAT(sessions_.EndedAmong(handles, kNow), IsEmpty()) << i;
+        handles.push_back(sessions_.Create(id, kNow).handle);
+    }
+    EXPECT_THAT(sessions_.EndedAmong(handles, kNow), ElementsAre(handles.front()));
+    EXPECT_TRUE(sessions_.FindBySecret(other.secret, kNow));
+}
+
 TEST_P(AccountTest, SessionsEndByIdlenessAndByAge) {
     const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
     std::vector<std::int64_t> every_11_hours(15);

@@ -14,6 +14,7 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+#include "platform/admission/pairauth.h"
 #include "platform/log/dbglogcfg.h"
 #include "platform/output/multipartresponse.h"
 #include "platform/webapi/apirequest.h"
@@ -117,6 +118,11 @@ void Serve(APIRequest* request, APIResponse* response) {
         throw std::runtime_error("thrown on purpose");
     } else if (method == "EmptyStream") {
         const MultipartResponse nothing;
+    } else if (method == "PeerStream") {
+        if (IsAuthPairMatch(request->GetParam("cookie", "").asString(),
+                            request->GetParam("timestamp", "").asString())) {
+            Stream(false);
+        }
     } else if (method == "Stream") {
         StopOnSigterm();
         Stream(false);
@@ -128,7 +134,7 @@ void Serve(APIRequest* request, APIResponse* response) {
             pause();
         }
     } else if (method == "Devour") {
-        std::vector<char> much(std::size_t{2} << 30);
+        std::vector<char> much(std::size_t{300} << 20);
         response->SetSuccess(much.back());
     } else if (method == "Crash") {
         std::abort();
@@ -166,6 +172,7 @@ const Row kTable[] = {{"Test", 1, "Nothing", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", Serve},
                       {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Serve},
+                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "PeerStream", Serve},
                       {"VEXO.Lookhaven.Player", 1, "PlayMjpegEvent", Play},
                       {"VEXO.Lookhaven.Player", 1, "PlayMjpegEventNoFrameId", Play},
                       {nullptr, 0, nullptr, nullptr}};

@@ -1,0 +1,108 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What processes that start at once may occupy together, and what reaches a slot that has changed hands.
+#include "standalone/control/slot_table.h"
+
+#include <algorithm>
+#include <csignal>
+#include <functional>
+
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace lookhaven::control {
+namespace {
+
+// Runs try_it in a process per slot, all released at once; how many of them it was true in.
+int SucceedAtOnce(const std::vector<Slot*>& slots, const std::function<bool(Slot&)>& try_it) {
+    int gate[2];
+    EXPECT_EQ(pipe(gate), 0);
+    for (Slot* slot : slots) {
+        if (fork() == 0) {
+            char byte = 0;
+            close(gate[1]);
+            while (read(gate[0], &byte, 1) > 0) {
+            }
+            _exit(try_it(*slot) ? 0 : 1);
+        }
+    }
+    close(gate[0]);
+    close(gate[1]);
+    int succeeded = 0;
+    for (std::size_t i = 0; i < slots.size(); ++i) {
+        int status = 0;
+        wait(&status);
+        succeeded += WIFEXITED(status) && WEXITSTATUS(status) == 0 ? 1 : 0;
+    }
+    return succeeded;
+}
+
+TEST(SlotTable, IsNotOvershotByABurst) {
+    SlotTable table(40);
+    std::vector<Slot*> slots;
+    for (int i = 0; i < 40; ++i) {
+        slots.push_back(table.Take());
+    }
+    ASSERT_EQ(table.Take(), nullptr);
+    const auto admit = [&table](Slot& slot) { return table.Admit(slot, 7, 5, 100) == Admission::kGranted; };
+    const auto hash = [&table](Slot& slot) { return table.BeginHashing(slot, 4); };
+    EXPECT_EQ(SucceedAtOnce(slots, admit), 5);
+    EXPECT_EQ(SucceedAtOnce(slots, hash), 4);
+    EXPECT_EQ(table.Admit(*slots[0], 8, 5, 5), slots[0]->user == 7 ? Admission::kGranted : Admission::kTooMany);
+    const auto other = std::ranges::find(slots, Work::kNone, [](const Slot* slot) { return slot->work.load(); });
+    EXPECT_FALSE(hash(**other)) << "the host has not reaped those that ended";
+    for (Slot* slot : slots) {
+        SlotTable::Free(*slot);
+    }
+    Slot* next = table.Take();
+    EXPECT_TRUE(hash(*next));
+}
+
+TEST(SlotTable, SurvivesAProcessKilledInTheMidstOfIt) {
+    SlotTable table(2);
+    Slot& slot = *table.Take();
+    for (int i = 0; i < 50; ++i) {
+        const pid_t child = fork();
+        if (child == 0) {
+            for (;;) {
+                table.BeginHashing(slot, 1);
+            }
+        }
+        usleep(static_cast<useconds_t>(i * 20));
+        kill(child, SIGKILL);
+        waitpid(child, nullptr, 0);
+        ASSERT_TRUE(table.BeginHashing(slot, 1)) << i;
+    }
+}
+
+TEST(SlotTable, RequestsForAPlayerDoNotReachItsSuccessor) {
+    SlotTable table(1);
+    const auto play = [&table] {
+        Slot& slot = *table.Take();
+        SlotTable::SetSession(slot, "abc");
+        table.BeginPlayer(slot, 5);
+        return SlotUse(*table.FindPlayer("abc", 5));
+    };
+    const SlotUse first = play();
+    const auto pause = [](Pause& asked) { asked = {true, -8}; };
+    EXPECT_TRUE(SlotTable::ChangePause(first, pause));
+    EXPECT_EQ(SlotTable::ChangePause(first, pause)->resumed_rate, -8);
+    SlotTable::Free(*first.slot);
+    const SlotUse second = play();
+    ASSERT_EQ(second.slot, first.slot);
+    table.End(second);
+    table.End(first);
+    EXPECT_TRUE(second.slot->MustEnd()) << "a late mark takes no newer one away";
+    SlotTable::Free(*second.slot);
+    const SlotUse third = play();
+    table.End(first);
+    EXPECT_FALSE(SlotTable::ChangePause(first, pause));
+    EXPECT_FALSE(SlotTable::PauseOf(*third.slot).on);
+    EXPECT_FALSE(third.slot->MustEnd());
+    table.EndSession("abc");
+    EXPECT_TRUE(third.slot->MustEnd());
+}
+
+}  // namespace
+}  // namespace lookhaven::control
