@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <new>
 
 #include <sys/resource.h>
 #include <sys/socket.h>
@@ -138,6 +139,8 @@ std::string ServeOrFail(const Service& service, http::Request& request, control:
         return http::FailureAnswer(failure);
     } catch (const Json::Exception&) {
         return http::FailureAnswer(Failure(400, "a parameter has the wrong type"));
+    } catch (const std::bad_alloc&) {
+        return http::FailureAnswer(Failure(500, "the answer needs too much memory; ask for less at once"));
     } catch (const std::exception& error) {
         base::LogError(std::string("the request failed: ") + error.what());
     } catch (...) {
