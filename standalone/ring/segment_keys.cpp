@@ -172,6 +172,13 @@ bool RemoveIfAbandoned(std::uint64_t installation, int shm_id) {
 std::optional<FoundSegment> FindSegment(std::uint64_t installation, const StreamId& id) {
     const StreamKeys keys(installation, id);
     std::optional<FoundSegment> found;
+    // Nearly always it has its first key.
+    if (const int shm_id = ::shmget(keys.At(0), 0, 0); shm_id >= 0) {
+        found = OpenIfStreams(shm_id, installation, id);
+    }
+    if (found) {
+        return found;
+    }
     ForEachOwnSegment([&](int shm_id, const shmid_ds& status) {
         if (!found && keys.Has(status.shm_perm.__key)) {
             found = OpenIfStreams(shm_id, installation, id);
