@@ -114,8 +114,9 @@ void DetachSegment(void* address) {
 }
 
 void ForEachOwnSegment(const std::function<void(int shm_id, const shmid_ds&)>& call, uid_t user) {
-    shm_info totals{};
-    const int last = ::shmctl(0, SHM_INFO, reinterpret_cast<shmid_ds*>(&totals));
+    // Unlike SHM_INFO this counts no pages.
+    shminfo limits{};
+    const int last = ::shmctl(0, IPC_INFO, reinterpret_cast<shmid_ds*>(&limits));
     for (int i = 0; i <= last; ++i) {
         shmid_ds status{};
         const int shm_id = ::shmctl(i, SHM_STAT, &status);
