@@ -7,6 +7,8 @@
 #include <cstdio>
 #include <memory>
 
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 std::string g_PlayerSessionId;
@@ -20,8 +22,20 @@ struct FileCloser {
     void operator()(std::FILE* file) const { std::fclose(file); }
 };
 
-std::unique_ptr<std::FILE, FileCloser> OpenPidFile(const char* mode) {
-    return std::unique_ptr<std::FILE, FileCloser>(std::fopen(PlayerPidFile().c_str(), mode));
+// The folder is open to every local user: only a regular file of this user, under one name, is the pid file.
+std::unique_ptr<std::FILE, FileCloser> OpenPidFile(int flags, const char* mode) {
+    const int descriptor = open(PlayerPidFile().c_str(), flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0600);
+    if (descriptor < 0) {
+        return nullptr;
+    }
+    struct stat status = {};
+    const bool is_own = fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode) && status.st_uid == geteuid() &&
+                        status.st_nlink <= 1;
+    std::unique_ptr<std::FILE, FileCloser> file(is_own ? fdopen(descriptor, mode) : nullptr);
+    if (!file) {
+        close(descriptor);
+    }
+    return file;
 }
 
 void OnStopSignal(int) {
@@ -53,8 +67,8 @@ std::string PlayerPidFile() {
 }
 
 bool WritePlayerPidFile() {
-    const auto file = OpenPidFile("w");
-    if (!file) {
+    const auto file = OpenPidFile(O_WRONLY | O_CREAT, "w");
+    if (!file || ftruncate(fileno(file.get()), 0) != 0) {
         return false;
     }
     std::fprintf(file.get(), "%d", getpid());
@@ -65,7 +79,7 @@ int CheckPlayerPidFile() {
     if (g_PlayerSessionId.empty()) {
         return -1;
     }
-    const auto file = OpenPidFile("r");
+    const auto file = OpenPidFile(O_RDONLY, "r");
     if (!file) {
         return -1;
     }

@@ -11,6 +11,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
@@ -138,7 +139,7 @@ std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms) {
 
 FrameIndexWriter::FrameIndexWriter(const std::filesystem::path& path, const IndexHeader& header)
     : path_(path.string()),
-      file_(base::OpenFile(path, O_RDWR | O_CREAT | O_EXCL, 0640)) {
+      file_(OpenFile(path, O_RDWR | O_CREAT | O_EXCL)) {
     RawHeader raw;
     raw.start_wall_ms = header.start_wall_ms;
     raw.width = header.width;
@@ -155,7 +156,7 @@ FrameIndexWriter::FrameIndexWriter(const std::filesystem::path& path, const Inde
         }
         WriteAll(file_.Get(), &raw, sizeof(raw), 0, path_);
     } catch (...) {
-        ::unlink(path.c_str());
+        RemoveFile(path);
         throw;
     }
     size_bytes_ = sizeof(raw);
@@ -188,8 +189,11 @@ void FrameIndexWriter::Finish() {
 }
 
 FrameIndexReader::FrameIndexReader(const std::filesystem::path& path)
-    : path_(path.string()),
-      file_(base::OpenFile(path, O_RDONLY)),
+    : FrameIndexReader(OpenFile(path, O_RDONLY), path.string()) {}
+
+FrameIndexReader::FrameIndexReader(base::FileDescriptor file, std::string path)
+    : path_(std::move(path)),
+      file_(std::move(file)),
       position_bytes_(sizeof(RawHeader)) {
     RawHeader raw;
     const std::size_t size = ReadUpTo(file_.Get(), &raw, sizeof(raw), 0, path_);

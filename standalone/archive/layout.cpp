@@ -5,9 +5,8 @@
 #include <charconv>
 #include <cstdio>
 #include <ctime>
-#include <system_error>
 
-#include "standalone/base/file.h"
+#include "standalone/archive/file.h"
 
 namespace lookhaven::archive {
 
@@ -79,10 +78,7 @@ std::filesystem::path IndexPathOf(std::filesystem::path recording) {
 }
 
 void MakeFolderFor(const std::filesystem::path& mount, const FileName& name) {
-    const std::filesystem::path camera = mount / std::to_string(name.camera);
-    for (const std::filesystem::path& folder : {camera, camera / DayOf(name.start_s)}) {
-        std::filesystem::create_directory(folder);  // fails when the parent is missing
-    }
+    MakeFolders(mount / std::to_string(name.camera) / DayOf(name.start_s));
 }
 
 }  // namespace lookhaven::archive

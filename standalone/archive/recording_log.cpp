@@ -3,11 +3,13 @@
 
 #include <algorithm>
 #include <stdexcept>
+#include <system_error>
 #include <vector>
 
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
@@ -39,8 +41,7 @@ void WriteRecordingLog(const std::filesystem::path& camera_folder, std::int64_t 
         throw std::logic_error("more than a day of recording log at once");
     }
     const auto write = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t, std::size_t count) {
-        std::filesystem::create_directory(path.parent_path());
-        const base::FileDescriptor log = base::OpenFile(path, O_WRONLY | O_CREAT);
+        const base::FileDescriptor log = OpenFileInNewDay(path, O_WRONLY | O_CREAT, 0600);
         const std::vector<std::uint8_t> bytes(count, reason);
         if (!base::WriteAllAt(log.Get(), bytes.data(), bytes.size(), static_cast<std::uint64_t>(offset))) {
             base::ThrowErrno("cannot write " + path.string());
@@ -62,9 +63,11 @@ bool ReadRecordingLog(const std::filesystem::path& camera_folder, std::int64_t b
     std::fill(seconds.begin(), seconds.end(), std::uint8_t{0});
     const auto read = [&](const std::filesystem::path& path, std::int64_t offset, std::size_t first,
                           std::size_t count) {
-        const base::FileDescriptor log(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
-        if (log) {
+        try {
+            const base::FileDescriptor log = OpenFile(path, O_RDONLY);
             base::ReadAllAt(log.Get(), &seconds[first], count, static_cast<std::uint64_t>(offset));
+        } catch (const std::system_error&) {
+            return;  // nothing was recorded on that day
         }
     };
     ForEachDay(camera_folder, begin_s, begin_s + static_cast<std::int64_t>(seconds.size()), read);

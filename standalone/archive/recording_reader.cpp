@@ -10,6 +10,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
@@ -34,7 +35,7 @@ class RecordingReader::Segment {
   public:
     Segment(std::filesystem::path path, std::optional<std::int64_t> base_ms)
         : path_(std::move(path)),
-          file_(base::OpenFile(path_, O_RDONLY)),
+          file_(OpenFile(path_, O_RDONLY)),
           index_(IndexPathOf(path_)),
           base_ms_(base_ms) {}
 

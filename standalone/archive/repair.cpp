@@ -7,9 +7,9 @@
 #include <vector>
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/base/file.h"
@@ -26,15 +26,7 @@ struct Index {
     bool is_damaged = false;  // after the frames
 };
 
-std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::path& path) {
-    struct stat status {};
-    if (::fstat(file.Get(), &status) != 0) {
-        base::ThrowErrno("cannot read " + path.string());
-    }
-    return static_cast<std::uint64_t>(status.st_size);
-}
-
-// The readable part of the index; nothing when it is missing or even its header is damaged.
+// The readable part of the index; nothing when it is missing, no regular file, or even its header is damaged.
 std::optional<Index> ReadIndex(const std::filesystem::path& path, std::uint64_t recording_bytes) {
     try {
         FrameIndexReader reader(path);
@@ -51,7 +43,8 @@ std::optional<Index> ReadIndex(const std::filesystem::path& path, std::uint64_t 
     } catch (const ArchiveError&) {
         return std::nullopt;
     } catch (const std::system_error& error) {
-        if (error.code() == std::errc::no_such_file_or_directory) {
+        const bool is_link = error.code() == std::errc::too_many_symbolic_link_levels;
+        if (is_link || error.code() == std::errc::no_such_file_or_directory) {
             return std::nullopt;
         }
         throw;
@@ -65,14 +58,14 @@ std::uint64_t EndOf(const std::vector<FrameEntry>& frames) {
 void ReplaceIndex(const std::filesystem::path& path, const IndexHeader& header, std::span<const FrameEntry> frames) {
     std::filesystem::path temporary = path;
     temporary += ".new";
-    std::filesystem::remove(temporary);
+    RemoveFile(temporary);
     try {
         FrameIndexWriter writer(temporary, header);
         writer.Append(frames);
         writer.Finish();
-        std::filesystem::rename(temporary, path);
+        RenameFile(temporary, path.filename());
     } catch (...) {
-        ::unlink(temporary.c_str());
+        RemoveFile(temporary);
         throw;
     }
 }
@@ -84,7 +77,7 @@ Contents Summary(const IndexHeader& header, const std::vector<FrameEntry>& frame
         last_ms = std::max(last_ms, frame.time_ms);
     }
     return {header, static_cast<int>(frames.size()), DurationMs(static_cast<std::int64_t>(frames.size()), last_ms),
-            recording_bytes + std::filesystem::file_size(index_path)};
+            recording_bytes + SizeOf(OpenFile(index_path, O_RDONLY), index_path)};
 }
 
 // Every frame up to the first damage, and where they end.
@@ -114,7 +107,7 @@ std::optional<Walk> WalkRecording(int file) {
 
 Contents CloseCrashed(const std::filesystem::path& recording) {
     const std::filesystem::path index_path = IndexPathOf(recording);
-    const base::FileDescriptor file = base::OpenFile(recording, O_RDWR);
+    const base::FileDescriptor file = OpenFile(recording, O_RDWR);
     const std::uint64_t size = SizeOf(file, recording);
     const std::optional<Index> index = ReadIndex(index_path, size);
     if (index && index->is_finished && !index->is_damaged && !index->frames.empty()) {

@@ -6,11 +6,8 @@
 #include <optional>
 #include <string_view>
 
-#include <fcntl.h>
-#include <sys/stat.h>
-
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
-#include "standalone/base/file.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {
@@ -71,15 +68,11 @@ void WriteSpan(const std::filesystem::path& path, const Span& span) {
         text += "recording " + recording + '\n';
     }
     Parse(text, path.string());
-    base::WriteFileAtomically(path, text, 0640);
+    WriteFileAtomically(path, text);
 }
 
 Span ReadSpan(const std::filesystem::path& path) {
-    struct stat status {};
-    if (::stat(path.c_str(), &status) == 0 && (!S_ISREG(status.st_mode) || status.st_size > off_t{kMaxBytes})) {
-        throw ArchiveError(path.string() + " is no span of recordings");
-    }
-    return Parse(base::ReadFile(path), path.string());
+    return Parse(ReadFile(path, kMaxBytes), path.string());
 }
 
 }  // namespace lookhaven::archive

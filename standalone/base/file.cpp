@@ -30,7 +30,7 @@ FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsigned i
 }
 
 FileDescriptor LockFile(const std::filesystem::path& path) {
-    FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT);
+    FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT | O_NOFOLLOW);
     while (::flock(file.Get(), LOCK_EX) != 0) {
         if (errno != EINTR) {
             ThrowErrno("cannot lock " + path.string());
@@ -58,7 +58,8 @@ std::string ReadFile(const std::filesystem::path& path) {
 namespace {
 
 void WriteWholeFile(const std::filesystem::path& path, std::string_view contents, unsigned int mode) {
-    const FileDescriptor file = OpenFile(path, O_WRONLY | O_CREAT | O_TRUNC, mode);
+    ::unlink(path.c_str());
+    const FileDescriptor file = OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, mode);
     if (!WriteAll(file.Get(), contents.data(), contents.size()) || ::fsync(file.Get()) != 0) {
         ThrowErrno("cannot write " + path.string());
     }
@@ -80,10 +81,14 @@ void WriteFileAtomically(const std::filesystem::path& path, std::string_view con
 
 SharedMapping::SharedMapping(const std::filesystem::path& path, std::size_t size_bytes, unsigned int mode)
     : size_bytes_(size_bytes) {
-    const FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT, mode);
+    const FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT | O_NOFOLLOW, mode);
     struct stat status {};
     if (::fstat(file.Get(), &status) != 0) {
         ThrowErrno("cannot stat " + path.string());
+    }
+    if (!S_ISREG(status.st_mode)) {
+        errno = ELOOP;
+        ThrowErrno("no regular file: " + path.string());
     }
     // Reserving the blocks now turns a full disk into an error here instead of a bus error later.
     if (status.st_size < static_cast<off_t>(size_bytes)) {

@@ -41,13 +41,15 @@ class MappedTable {
         return table;
     }
 
-    // Nothing when the file cannot be opened or is not of a T's size. Of a const T the mapping is read-only. Throws
-    // std::system_error when mapping fails. Flags are open's.
-    static std::optional<MappedTable> Open(const std::filesystem::path& path, int flags = 0) {
+    // Nothing when the file cannot be opened, is a link, or is not of a T's size. Of a const T the mapping is read-only.
+    // Throws std::system_error when mapping fails.
+    static std::optional<MappedTable> Open(const std::filesystem::path& path) {
         constexpr bool kReadOnly = std::is_const_v<T>;
-        const base::FileDescriptor file(::open(path.c_str(), flags | O_CLOEXEC | (kReadOnly ? O_RDONLY : O_RDWR)));
+        constexpr int kFlags = O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | (kReadOnly ? O_RDONLY : O_RDWR);
+        const base::FileDescriptor file(::open(path.c_str(), kFlags));
         struct stat status {};
-        if (!file || ::fstat(file.Get(), &status) != 0 || status.st_size != static_cast<off_t>(sizeof(T))) {
+        if (!file || ::fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
+            status.st_size != static_cast<off_t>(sizeof(T))) {
             return std::nullopt;
         }
         return MappedTable(base::SharedMapping(file, sizeof(T), kReadOnly));

@@ -4,9 +4,13 @@
 #include <algorithm>
 #include <array>
 #include <charconv>
+#include <csignal>
+#include <filesystem>
 #include <string>
+#include <utility>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
@@ -15,21 +19,50 @@ namespace lookhaven::control {
 
 namespace {
 
+constexpr const char* kFolder = "/tmp";
+constexpr std::string_view kPrefix = "player_src.pid.";
+
 // Empty for what is no session handle, and so should not become a path.
 std::string PathOf(std::string_view session) {
     const bool is_handle = !session.empty() && session.find_first_not_of("0123456789abcdef") == session.npos;
-    return is_handle ? "/tmp/player_src.pid." + std::string(session) : "";
+    return is_handle ? std::string(kFolder) + '/' + std::string(kPrefix) + std::string(session) : "";
 }
 
-}  // namespace
+// Nothing when it is no regular file of this user under one name: the folder is open to every local user.
+base::FileDescriptor OpenOwn(const std::string& path) {
+    base::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    struct stat status {};
+    const bool is_own = file && ::fstat(file.Get(), &status) == 0 && S_ISREG(status.st_mode) &&
+                        status.st_uid == ::geteuid() && status.st_nlink <= 1;
+    return is_own ? std::move(file) : base::FileDescriptor();
+}
 
-pid_t ReadPlayerFile(std::string_view session) {
-    const base::FileDescriptor file(::open(PathOf(session).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+pid_t ProcessIn(const base::FileDescriptor& file) {
     std::array<char, 16> text{};
     const ssize_t length = file ? ::read(file.Get(), text.data(), text.size()) : 0;
     pid_t owner = 0;
     std::from_chars(text.data(), text.data() + std::max<ssize_t>(length, 0), owner);
     return owner;
+}
+
+}  // namespace
+
+pid_t ReadPlayerFile(std::string_view session) {
+    return ProcessIn(OpenOwn(PathOf(session)));
+}
+
+void SweepPlayerFiles() {
+    std::error_code error;
+    for (const auto& entry : std::filesystem::directory_iterator(kFolder, error)) {
+        if (!entry.path().filename().string().starts_with(kPrefix)) {
+            continue;
+        }
+        const base::FileDescriptor file = OpenOwn(entry.path());
+        const pid_t process = ProcessIn(file);
+        if (file && (process <= 0 || ::kill(process, 0) != 0)) {
+            ::unlink(entry.path().c_str());
+        }
+    }
 }
 
 void SweepPlayerFile(std::string_view session, pid_t process) {

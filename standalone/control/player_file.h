@@ -9,8 +9,12 @@
 
 namespace lookhaven::control {
 
-// The process that the session's file names; 0 when there is no file, or nothing readable in it. Never waits.
+// The process that the session's file names; 0 when there is no file of this user, or nothing readable in it. Never
+// waits.
 pid_t ReadPlayerFile(std::string_view session);
+
+// Removes the files of this user that name no living process of this user: a host that was killed left them.
+void SweepPlayerFiles();
 
 // Removes the file when it names the process, which has ended: one that was killed could not.
 void SweepPlayerFile(std::string_view session, pid_t process);

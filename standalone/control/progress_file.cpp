@@ -9,7 +9,6 @@
 #include <string>
 #include <thread>
 
-#include <fcntl.h>
 #include <unistd.h>
 
 namespace lookhaven::control {
@@ -41,7 +40,7 @@ struct ProgressFile::Record {
 
 std::optional<ProgressFile> ProgressFile::Open(const std::filesystem::path& folder, std::int64_t key,
                                                std::string_view session) {
-    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key), O_NOFOLLOW);
+    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key));
     if (!record) {
         return std::nullopt;
     }
@@ -98,7 +97,7 @@ std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folde
 
 void ProgressFile::Sweep(const std::filesystem::path& folder, std::int64_t key, pid_t owner) {
     const std::filesystem::path path = PathOf(folder, key);
-    const auto record = MappedTable<Record>::Open(path, O_NOFOLLOW);
+    const auto record = MappedTable<Record>::Open(path);
     if (record && (*record)->owner.compare_exchange_strong(owner, kSwept)) {
         ::unlink(path.c_str());
     }

@@ -14,6 +14,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
+#include "standalone/control/player_file.h"
 #include "standalone/http/answer.h"
 
 namespace lookhaven::host {
@@ -67,6 +68,7 @@ Server::Server(const base::Installation& installation, ChildWork work, base::Fil
     }
     // What the players of a host that was killed have left.
     std::filesystem::remove_all(installation.ProgressFolder());
+    control::SweepPlayerFiles();
     Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
     Watch(signals_.Get(), Kind::kSignals, 0, EPOLLIN);
     Watch(slots_.WakeDescriptor(), Kind::kWake, 0, EPOLLIN);

@@ -15,6 +15,7 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/base/file.h"
 
 namespace lookhaven::maintenance {
@@ -22,6 +23,7 @@ namespace lookhaven::maintenance {
 namespace {
 
 constexpr const char* kMarkerName = ".lookhaven-mount";
+constexpr std::size_t kMaxMarkerBytes = 64;
 constexpr const char* kLogName = "seconds";
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
@@ -89,12 +91,12 @@ std::int64_t MountSpace::ReserveBytes() const {
 }
 
 void MountFolder::WriteMarker(const std::filesystem::path& folder, int mount_id) {
-    base::WriteFileAtomically(folder / kMarkerName, MarkerText(mount_id), 0644);
+    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mount_id), 0644);
 }
 
 std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, int mount_id) {
     try {
-        if (base::ReadFile(folder / kMarkerName) != MarkerText(mount_id)) {
+        if (archive::ReadFile(folder / kMarkerName, kMaxMarkerBytes) != MarkerText(mount_id)) {
             return std::nullopt;
         }
         return MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY));

@@ -6,8 +6,8 @@
 
 #include <fcntl.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/matroska_blocks.h"
-#include "standalone/base/file.h"
 
 namespace lookhaven::maintenance {
 
@@ -21,11 +21,11 @@ std::int64_t EndOf(std::int64_t start_s, std::int64_t duration_ms) {
 
 // Empty, or headers in our format without a frame: no other program leaves such a file.
 bool HasNoFrame(const std::filesystem::path& recording) {
-    if (std::filesystem::file_size(recording) == 0) {
+    const base::FileDescriptor file = archive::OpenFile(recording, O_RDONLY);
+    if (archive::SizeOf(file, recording) == 0) {
         return true;
     }
     try {
-        const base::FileDescriptor file = base::OpenFile(recording, O_RDONLY | O_NOFOLLOW);
         std::vector<archive::FrameEntry> frames;
         archive::MatroskaBlocks blocks(file.Get());
         return !blocks.ReadCluster(frames);

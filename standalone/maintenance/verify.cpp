@@ -10,11 +10,11 @@
 
 #include <fcntl.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/frame_index.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
-#include "standalone/base/file.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/salvage.h"
 #include "standalone/store/mounts.h"
@@ -39,7 +39,7 @@ struct Inspection {
 };
 
 Frames WalkRecording(const std::filesystem::path& path) {
-    const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW);
+    const base::FileDescriptor file = archive::OpenFile(path, O_RDONLY);
     Frames frames;
     archive::MatroskaBlocks blocks(file.Get());
     while (blocks.ReadCluster(frames)) {
@@ -57,7 +57,7 @@ Inspection Inspect(const std::filesystem::path& path) {
         if (result.is_growing) {
             return result;
         }
-        index.ReadNew(std::filesystem::file_size(path), indexed);
+        index.ReadNew(archive::SizeOf(archive::OpenFile(path, O_RDONLY), path), indexed);
         if (!index.IsFinished()) {
             result.problem = "the recording " + path.string() + " was never closed";
             return result;

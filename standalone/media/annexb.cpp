@@ -9,6 +9,9 @@ namespace lookhaven::media {
 namespace {
 
 constexpr std::array<std::uint8_t, 4> kStartCode{0, 0, 0, 1};
+// The standards allow 288 sets for H.264 and 96 for H.265; cameras send a handful of a hundred bytes.
+constexpr std::size_t kMaxSets = 512;
+constexpr std::size_t kMaxSetBytes = 65536;
 
 // The position just after the next start code, or the frame's size.
 std::size_t AfterStartCode(std::span<const std::uint8_t> frame, std::size_t from) {
@@ -87,9 +90,12 @@ std::span<const std::uint8_t> ParameterSets::Complete(std::span<const std::uint8
     return completed_;
 }
 
-// Parameter sets precede the picture, so the search ends there. Empty unless the frame has both kinds.
+// Parameter sets precede the picture, so the search ends there. Empty unless the frame has both kinds, and in sane
+// numbers: each set is compared with those before it.
 std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> frame) const {
+    std::vector<std::span<const std::uint8_t>> known;
     std::vector<std::uint8_t> sets;
+    std::size_t count = 0;
     bool has_sequence_set = false;
     bool has_picture_set = false;
     for (std::size_t begin = AfterStartCode(frame, 0); begin < frame.size();) {
@@ -104,7 +110,11 @@ std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> fr
                 --end;  // the extra zeros of a longer start code belong to no unit
             }
             const auto set = frame.subspan(begin, end - begin);
-            if (std::search(sets.begin(), sets.end(), set.begin(), set.end()) == sets.end()) {
+            if (++count > kMaxSets || sets.size() + set.size() > kMaxSetBytes) {
+                return {};
+            }
+            if (std::ranges::none_of(known, [&](auto other) { return std::ranges::equal(other, set); })) {
+                known.push_back(set);
                 sets.insert(sets.end(), kStartCode.begin(), kStartCode.end());
                 sets.insert(sets.end(), set.begin(), set.end());
             }

@@ -26,7 +26,7 @@ class ParameterSets {
     ParameterSets(Codec codec, std::span<const std::uint8_t> initial);
 
     // The key frame with its parameter sets in front. A frame that contains them is returned as it is, and its sets
-    // become the current ones; else a copy, valid until the next call.
+    // become the current ones; else a copy, valid until the next call. Sets beyond what any camera sends count as none.
     std::span<const std::uint8_t> Complete(std::span<const std::uint8_t> key_frame);
 
     // The current sets as Annex B; empty while there are none.

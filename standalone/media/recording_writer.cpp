@@ -7,6 +7,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
@@ -60,11 +61,11 @@ RecordingWriter::RecordingWriter(const std::filesystem::path& path, const MediaF
       start_wall_ms_(start_wall_ms),
       flushed_us_(base::MonotonicMicros()) {
     try {
-        file_ = base::OpenFile(path, O_RDWR | O_CREAT | O_EXCL, 0640);
+        file_ = archive::OpenFile(path, O_RDWR | O_CREAT | O_EXCL);
         try {
             Create(path, reason);
         } catch (...) {
-            ::unlink(path_.c_str());
+            archive::RemoveFile(path);
             throw;
         }
     } catch (const std::system_error& error) {

@@ -5,8 +5,10 @@
 #include <string>
 #include <vector>
 
+#include <fcntl.h>
 #include <sys/stat.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/frame_index.h"
 #include "standalone/archive/layout.h"
 #include "standalone/archive/span_file.h"
@@ -33,7 +35,7 @@ std::optional<Piece> PieceOf(const std::filesystem::path& path, std::optional<st
                              std::optional<std::int64_t> end_wall_ms) {
     archive::FrameIndexReader index(archive::IndexPathOf(path));
     std::vector<archive::FrameEntry> entries;
-    index.ReadNew(std::filesystem::file_size(path), entries);
+    index.ReadNew(archive::SizeOf(archive::OpenFile(path, O_RDONLY), path), entries);
     const std::int64_t start_ms = index.Header().start_wall_ms;
     const std::int64_t begin_ms = begin_wall_ms.value_or(start_ms) - start_ms;
     Piece piece{path, index.Header(), 0, -1};
@@ -106,7 +108,8 @@ class Copier {
         AvOptions options;
         options.Set("protocol_whitelist", "file").Set("format_whitelist", "matroska,webm");
         AVFormatContext* input = nullptr;
-        const std::string url = "file:" + piece.path.string();
+        file_ = archive::OpenFile(piece.path, O_RDONLY);
+        const std::string url = "file:/proc/self/fd/" + std::to_string(file_.Get());  // of this file, not of its path
         CheckAv(avformat_open_input(&input, url.c_str(), nullptr, options.Get()), "cannot open " + piece.path.string());
         input_.reset(input);
         video_ = av_find_best_stream(input, AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
@@ -165,6 +168,7 @@ class Copier {
     std::int64_t offset_ms_ = 0;
     std::int64_t last_ms_ = -1;
     std::int64_t flushed_ms_ = 0;
+    base::FileDescriptor file_;
     AvPtr<AVFormatContext> input_;
     AvPtr<AVPacket> packet_ = OwnAv(av_packet_alloc());
     int video_ = -1;

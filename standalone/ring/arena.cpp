@@ -24,7 +24,7 @@ std::uint32_t High(std::int64_t value) {
 Arena::Arena(const View& view) : view_(view), readers_(view) {
     // A predecessor may have died after it added an entry to the index, before it raised the newest count.
     newest_ = view_.Head().newest.load();
-    for (std::uint32_t i = 0; i < view_.Head().index_slots; ++i) {
+    for (std::uint32_t i = 0; i < view_.Constants().index_slots; ++i) {
         newest_ = std::max(newest_, view_.Slot(i).count.load());
     }
     StartRun();
@@ -33,7 +33,7 @@ Arena::Arena(const View& view) : view_(view), readers_(view) {
 void Arena::StartRun() {
     SegmentHead& head = view_.Head();
     head.newest_key.store(0);
-    for (std::uint32_t i = 0; i < head.index_slots; ++i) {
+    for (std::uint32_t i = 0; i < view_.Constants().index_slots; ++i) {
         view_.Slot(i).count.store(0);
     }
     head.newest.store(newest_);
@@ -71,7 +71,7 @@ void Arena::DropUpTo(const Region& region) {
 std::optional<Region> Arena::ChooseRegion(std::uint32_t blocks) const {
     std::uint64_t first = cursor_;
     for (bool wrapped = false;;) {
-        if (first + blocks > view_.Head().arena_blocks) {
+        if (first + blocks > view_.Constants().arena_blocks) {
             if (wrapped) {
                 return std::nullopt;
             }
@@ -107,7 +107,7 @@ std::optional<Region> Arena::Reserve(std::uint32_t blocks) {
 
 void Arena::Append(const Region& region, const Frame& frame, bool is_key) {
     SegmentHead& head = view_.Head();
-    while (!IsEmpty() && newest_ + 1 - oldest_ >= head.index_slots) {
+    while (!IsEmpty() && newest_ + 1 - oldest_ >= view_.Constants().index_slots) {
         DropOldest();
     }
     const std::uint64_t count = newest_ + 1;

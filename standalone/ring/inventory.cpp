@@ -6,46 +6,47 @@
 
 #include <sys/ipc.h>
 #include <sys/shm.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/futex.h"
 #include "standalone/ring/process_word.h"
 #include "standalone/ring/reader_table.h"
-#include "standalone/ring/segment.h"
+#include "standalone/ring/segment_keys.h"
 
 namespace lookhaven::ring {
 
 namespace {
 
-// Calls back for each segment of the system with one of our keys, as it was before we attach it.
-void ForEachRingKey(const std::function<void(int shm_id, const shmid_ds&)>& call) {
-    shm_info totals{};
-    const int last = ::shmctl(0, SHM_INFO, reinterpret_cast<shmid_ds*>(&totals));
-    for (int i = 0; i <= last; ++i) {
-        shmid_ds status{};
-        const int shm_id = ::shmctl(i, SHM_STAT, &status);
-        if (shm_id >= 0 && IsRingKey(status.shm_perm.__key)) {
-            call(shm_id, status);
-        }
-    }
+// Calls back for each segment of the installation that the user owns; those that vanish meanwhile are skipped.
+void ForEachSegment(std::uint64_t installation, uid_t user,
+                    const std::function<void(const Attachment&, SegmentCheck, const shmid_ds&)>& call) {
+    ForEachOwnSegment(
+        [&](int shm_id, const shmid_ds& status) {
+            if (!IsRingKey(status.shm_perm.__key)) {
+                return;
+            }
+            Attachment attachment;
+            try {
+                attachment = Attachment(shm_id, user);
+            } catch (const std::system_error&) {
+                return;
+            }
+            const SegmentCheck check = CheckSegment(attachment.Address());
+            const bool has_identity = check != SegmentCheck::kNotARing && check != SegmentCheck::kUnfinished;
+            if (has_identity && View(attachment.Address()).Constants().installation == installation) {
+                call(attachment, check, status);
+            }
+        },
+        user);
 }
 
-// Calls back for each segment of the installation; others and those that vanish meanwhile are skipped.
-void ForEachSegment(std::uint64_t installation,
-                    const std::function<void(const Attachment&, SegmentCheck, const shmid_ds&)>& call) {
-    ForEachRingKey([&](int shm_id, const shmid_ds& status) {
-        Attachment attachment;
-        try {
-            attachment = Attachment(shm_id);
-        } catch (const std::system_error&) {
-            return;
-        }
-        const SegmentCheck check = CheckSegment(attachment.Address(), status.shm_segsz);
-        const bool has_identity = check != SegmentCheck::kNotARing && check != SegmentCheck::kUnfinished;
-        if (has_identity && View(attachment.Address()).Head().installation == installation) {
-            call(attachment, check, status);
-        }
-    });
+// An administrator lists the segments of the user whose state folder it is.
+uid_t UserOf(const base::Installation& installation) {
+    struct stat status {};
+    const bool is_root = ::geteuid() == 0;
+    return is_root && ::stat(installation.Home().c_str(), &status) == 0 ? status.st_uid : ::geteuid();
 }
 
 // Becomes the dead writer's successor, so that no new writer adopts the ring meanwhile, and removes it.
@@ -65,13 +66,13 @@ bool RemoveDeadWriters(const Attachment& attachment) {
 
 std::vector<SegmentState> ListSegments(const base::Installation& installation) {
     std::vector<SegmentState> states;
-    ForEachSegment(installation.Id(), [&](const Attachment& attachment, SegmentCheck check, const shmid_ds& status) {
+    const auto add = [&](const Attachment& attachment, SegmentCheck check, const shmid_ds& status) {
         const View view(attachment.Address());
         SegmentState& state = states.emplace_back();
         state.shm_id = attachment.ShmId();
         state.id = view.Id();
         state.size_bytes = status.shm_segsz;
-        state.layout_version = view.Head().layout_version;
+        state.layout_version = view.Constants().layout_version;
         state.attached = status.shm_nattch;
         state.has_known_layout = check == SegmentCheck::kGood;
         if (state.has_known_layout) {
@@ -81,13 +82,14 @@ std::vector<SegmentState> ListSegments(const base::Installation& installation) {
             state.entries_dropped = view.Head().dropped.load();
             state.readers = ReaderTable(view).Used();
         }
-    });
+    };
+    ForEachSegment(installation.Id(), UserOf(installation), add);
     return states;
 }
 
 std::size_t RemoveOrphans(const base::Installation& installation) {
     std::size_t removed = 0;
-    ForEachSegment(installation.Id(), [&](const Attachment& attachment, SegmentCheck check, const shmid_ds& status) {
+    const auto remove = [&](const Attachment& attachment, SegmentCheck check, const shmid_ds& status) {
         if (status.shm_nattch != 0) {
             return;
         }
@@ -97,9 +99,11 @@ std::size_t RemoveOrphans(const base::Installation& installation) {
             attachment.RemoveSegment();  // a living writer would have it attached
             ++removed;
         }
+    };
+    ForEachSegment(installation.Id(), ::geteuid(), remove);
+    ForEachOwnSegment([&](int shm_id, const shmid_ds& status) {
+        removed += IsRingKey(status.shm_perm.__key) && RemoveIfAbandoned(installation.Id(), shm_id) ? 1 : 0;
     });
-    ForEachRingKey(
-        [&](int shm_id, const shmid_ds&) { removed += RemoveIfAbandoned(installation.Id(), shm_id) ? 1 : 0; });
     return removed;
 }
 

@@ -48,11 +48,11 @@ const Entry* PinnedRead::Pin(std::uint64_t count) {
 void PinnedRead::HandOver(const Entry* entry, std::uint64_t count) {
     if (position_ != nullptr) {
         position_->count = count;
-        position_->pinned = static_cast<std::int32_t>(count % Head().index_slots);
+        position_->pinned = static_cast<std::int32_t>(count % view_.Constants().index_slots);
         return;
     }
     const std::lock_guard lock(process_pins_mutex);
-    process_pins.push_back({ring_, Head().generation, entry, reader_});
+    process_pins.push_back({ring_, view_.Constants().generation, entry, reader_});
     handed_over_ = true;
 }
 
@@ -97,7 +97,7 @@ void ReleaseProcessPins(void* ring, const Entry* only_entry) {
             return false;
         }
         // The pin may be of another ring, attached earlier at the same address.
-        if (pin.generation == View(ring).Head().generation) {
+        if (pin.generation == View(ring).Constants().generation) {
             ReaderTable(View(ring)).Release(pin.reader);
         }
         return true;

@@ -22,7 +22,7 @@ class PinnedRead {
     PinnedRead(void* ring, Position* position) : view_(ring), ring_(ring), table_(view_), position_(position) {
         if (position_ == nullptr) {
             reader_ = table_.Claim();
-        } else if (position_->generation == view_.Head().generation) {
+        } else if (position_->generation == view_.Constants().generation) {
             reader_ = position_->reader;
         }
         slot_ = table_.Own(reader_);

@@ -7,20 +7,20 @@
 #include <system_error>
 
 #include <sys/mman.h>
-#include <sys/shm.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/futex.h"
 #include "standalone/base/log.h"
 #include "standalone/ring/pinned_read.h"
 #include "standalone/ring/process_word.h"
+#include "standalone/ring/segment_keys.h"
 
 namespace lookhaven::ring {
 
 namespace {
 
 void Unpin(void* ring, Position& position) {
-    if (position.generation == View(ring).Head().generation) {
+    if (position.generation == View(ring).Constants().generation) {
         if (ReaderSlot* slot = ReaderTable(View(ring)).Own(position.reader)) {
             slot->pin.store(0);
         }
@@ -41,7 +41,7 @@ void* Attach(const base::Installation& installation, const StreamId& id) try {
         if (logged.test_and_set()) {
             return nullptr;
         }
-        base::LogError("the ring of camera " + std::to_string(id.camera) + " stream " + std::to_string(id.stream) +
+        base::LogError("the ring of " + NameOf(id) +
                        (found->check == SegmentCheck::kOtherLayout ? " was made by another version of the recorder"
                                                                    : " is damaged") +
                        ": restart the recorder");
@@ -60,7 +60,7 @@ void* AttachEmpty(const StreamId& id, const StreamFormat& format) {
 
 void Detach(void* ring) {
     if (ring != nullptr) {
-        ::shmdt(ring);
+        DetachSegment(ring);
     }
 }
 
@@ -68,11 +68,11 @@ void StartRead(void* ring, Position* position) {
     if (position != nullptr) {
         const View view(ring);
         *position = Position{};
-        position->generation = view.Head().generation;
+        position->generation = view.Constants().generation;
         position->reader = ReaderTable(view).Claim();
         // A stream reads the whole ring over and over. Mapping all its pages now is cheaper than a page fault for every
         // few of them later. Kernels without this call take the page faults.
-        ::madvise(ring, view.Head().segment_bytes, MADV_POPULATE_READ);
+        ::madvise(ring, view.Local().real_bytes, MADV_POPULATE_READ);
     }
 }
 
@@ -81,7 +81,7 @@ void StopRead(void* ring, Position* position) {
         ReleaseProcessPins(ring, nullptr);
         return;
     }
-    if (position->generation == View(ring).Head().generation) {
+    if (position->generation == View(ring).Constants().generation) {
         ReaderTable(View(ring)).Release(position->reader);
     }
     position->reader = -1;
@@ -176,20 +176,20 @@ std::int64_t HeartbeatAgeMicros(const void* ring) {
 }
 
 const char* Codec(const void* ring) {
-    return View(ring).Head().codec;
+    return View(ring).Constants().codec;
 }
 
 std::span<const unsigned char> ExtraData(const void* ring) {
-    const SegmentHead& head = View(ring).Head();
-    return {head.extra_data, head.extra_length};
+    const SegmentConstants& constants = View(ring).Constants();
+    return {constants.extra_data, constants.extra_length};
 }
 
 std::int32_t Width(const void* ring) {
-    return View(ring).Head().width;
+    return View(ring).Constants().width;
 }
 
 std::int32_t Height(const void* ring) {
-    return View(ring).Head().height;
+    return View(ring).Constants().height;
 }
 
 Medium MediumOf(const void* ring) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The layout of a ring in shared memory, and how segments are found, made and checked.
+// The layout of a ring in shared memory, and the check of a segment.
 //
 // Format        | SegmentHead | ReaderSlot × kReaderSlots | IndexSlot × index_slots | arena |
 //               The arena is counted in blocks of kBlockBytes. An entry fills whole blocks: its 44-byte head, then its
@@ -12,7 +12,10 @@
 //               count again. All of these are sequentially consistent, so of a writer and a reader that meet, the
 //               writer sees the pin, or the reader sees that the entry is gone. The writer skips pinned regions.
 //
-// Invariants    (1) All but the changing part of the head is constant once magic is there.
+// Trust         Whoever writes to a segment could change its geometry after the check. So an attachment copies the
+//               constants to memory of this process; what is checked is the copy, and only the copy is used.
+//
+// Invariants    (1) The constants do not change once magic is there.
 //               (2) A slot's region changes only while its count is 0, and no count is used twice.
 //               (3) A reader slot's pin belongs to its owner; a free slot has no pin.
 //
@@ -26,12 +29,7 @@
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
-#include <optional>
 #include <span>
-#include <string>
-#include <utility>
-
-#include <sys/types.h>
 
 #include "standalone/ring/stream.h"
 
@@ -42,9 +40,8 @@ constexpr std::uint32_t kLayoutVersion = 1;
 constexpr std::uint32_t kReaderSlots = 512;
 constexpr std::uint32_t kBlockBytes = 64;
 
-struct SegmentHead {
+struct SegmentConstants {
     // The same in every layout version.
-    std::atomic<std::uint64_t> magic;
     std::uint32_t layout_version;
     std::uint32_t generation;  // differs between segments
     std::uint64_t segment_bytes;
@@ -62,6 +59,11 @@ struct SegmentHead {
     std::uint32_t extra_length;
     char codec[kMaxCodecLength + 1];
     unsigned char extra_data[kMaxExtraBytes];
+};
+
+struct SegmentHead {
+    std::atomic<std::uint64_t> magic;
+    SegmentConstants constants;
     // Changing.
     alignas(64) std::atomic<std::uint64_t> writer;  // process word, 0 when the stream has ended
     std::atomic<std::uint64_t> index_of;  // the writer whose entries the index names; set once earlier ones are out
@@ -71,6 +73,14 @@ struct SegmentHead {
     std::atomic<std::uint64_t> dropped;
     std::atomic<std::uint32_t> retired;
     std::atomic<std::uint32_t> wake;  // futex word, changes with each entry
+};
+
+// What an attachment copies out of the segment. It lies in memory of this process that ends where the segment begins,
+// since the segment's address is all that a ring's caller holds.
+struct alignas(64) LocalHead {
+    std::uint64_t magic;
+    std::uint64_t real_bytes;    // of the segment, as the system counts them
+    SegmentConstants constants;  // zeros without the magic
 };
 
 struct ReaderSlot {
@@ -101,12 +111,14 @@ constexpr std::int32_t SequenceOf(std::uint64_t count) {
     return static_cast<std::int32_t>((count - 1) % (kLastSequence + 1));
 }
 
-// A checked segment at its address. Borrows the attachment.
+// A checked segment at the address of its attachment, which it borrows.
 class View {
   public:
     explicit View(const void* address) : base_(static_cast<unsigned char*>(const_cast<void*>(address))) {}
 
     SegmentHead& Head() const { return *reinterpret_cast<SegmentHead*>(base_); }
+    const LocalHead& Local() const { return *reinterpret_cast<const LocalHead*>(base_ - sizeof(LocalHead)); }
+    const SegmentConstants& Constants() const { return Local().constants; }
     std::span<ReaderSlot> Readers() const;
     IndexSlot& Slot(std::uint64_t count) const;
     // Raw memory of the region, which must lie inside the arena.
@@ -121,58 +133,12 @@ class View {
     unsigned char* base_;
 };
 
-// One attachment of a segment to this process.
-class Attachment {
-  public:
-    Attachment() = default;
-    // shmat; throws std::system_error. With read_only nothing may be written.
-    explicit Attachment(int shm_id, bool read_only = false);
-    Attachment(Attachment&& other) noexcept
-        : shm_id_(std::exchange(other.shm_id_, -1)),
-          address_(std::exchange(other.address_, nullptr)) {}
-    Attachment& operator=(Attachment&& other) noexcept;
-    ~Attachment();
-
-    void* Address() const { return address_; }
-    int ShmId() const { return shm_id_; }
-    explicit operator bool() const { return address_ != nullptr; }
-    // Hands the attachment to the caller, who detaches it.
-    void* Release();
-    // Removes the segment's key: nobody finds it any more, and it vanishes with its last attachment.
-    void RemoveSegment() const;
-
-  private:
-    int shm_id_ = -1;
-    void* address_ = nullptr;
-};
-
 enum class SegmentCheck { kGood, kUnfinished, kNotARing, kOtherLayout, kDamaged };
 
-// Checks what is at the address of an attachment that is real_bytes long.
-SegmentCheck CheckSegment(const void* address, std::uint64_t real_bytes);
+// Checks the segment of the attachment at the address.
+SegmentCheck CheckSegment(const void* address);
 
 std::uint64_t SegmentBytes(const Geometry& geometry);
-
-// Keys of this system's segments share their highest byte.
-bool IsRingKey(key_t key);
-
-// Removes the segment, which has a ring key, if its creator was killed before the magic was written: nobody else ever
-// would. What may be another program's or another installation's stays.
-bool RemoveIfAbandoned(std::uint64_t installation, int shm_id);
-
-// A segment with the stream's identity; retired ones are skipped.
-struct FoundSegment {
-    Attachment attachment;
-    SegmentCheck check = SegmentCheck::kGood;
-};
-std::optional<FoundSegment> FindSegment(std::uint64_t installation, const StreamId& id);
-
-// Makes a segment that this process writes, with no entry in it. Throws std::system_error when memory or every key is
-// refused.
-Attachment CreateSegment(std::uint64_t installation, const StreamId& id, const StreamFormat& format,
-                         const Geometry& geometry);
-// The same without a name.
-Attachment CreatePrivateSegment(const StreamId& id, const StreamFormat& format, const Geometry& geometry);
 
 // The format as a segment keeps it: name cut at kMaxCodecLength, oversized extra data left out.
 StreamFormat Storable(StreamFormat format);

@@ -6,6 +6,11 @@
 
 namespace lookhaven::ring {
 
+std::string NameOf(const StreamId& id) {
+    return "camera " + std::to_string(id.camera) + " stream " + std::to_string(id.stream) +
+           (id.medium == Medium::kVideo ? " video" : " audio");
+}
+
 Geometry GeometryFor(const StreamEstimate& estimate) {
     const bool is_audio = estimate.medium == Medium::kAudio;
     // Cameras send a key frame every one to five seconds; ten seconds hold one whole group besides the running one.

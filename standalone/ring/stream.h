@@ -23,6 +23,9 @@ struct StreamId {
     bool operator==(const StreamId&) const = default;
 };
 
+// "camera 3 stream 0 video"
+std::string NameOf(const StreamId& id);
+
 constexpr std::size_t kMaxCodecLength = 31;
 constexpr std::size_t kMaxExtraBytes = 1024;
 

@@ -20,11 +20,6 @@ constexpr std::uint32_t kMaxIndexSlots = 8192;
 // With fewer frames than this in the arena, a few slow readers would leave no space.
 constexpr std::uint64_t kMinFrames = 4;
 
-std::string Name(const StreamId& id) {
-    return "camera " + std::to_string(id.camera) + " stream " + std::to_string(id.stream) +
-           (id.medium == Medium::kVideo ? " video" : " audio");
-}
-
 void Retire(const Attachment& attachment) {
     SegmentHead& head = View(attachment.Address()).Head();
     head.retired.store(1);
@@ -76,7 +71,7 @@ void Writer::Open() {
 // Takes over a dead writer's segment. False when a new one must be created instead.
 bool Writer::Adopt(FoundSegment& found) {
     if (found.check != SegmentCheck::kGood) {
-        base::LogWarning("ring of " + Name(id_) + " has another layout or is damaged: replaced");
+        base::LogWarning("ring of " + NameOf(id_) + " has another layout or is damaged: replaced");
         if (found.check == SegmentCheck::kDamaged) {
             Retire(found.attachment);  // tells its viewers to attach again
         } else {
@@ -87,7 +82,7 @@ bool Writer::Adopt(FoundSegment& found) {
     SegmentHead& head = View(found.attachment.Address()).Head();
     std::uint64_t writer = head.writer.load();
     if (IsWordAlive(writer) || !head.writer.compare_exchange_strong(writer, OwnWord())) {
-        throw std::runtime_error("the ring of " + Name(id_) + " is written by process " +
+        throw std::runtime_error("the ring of " + NameOf(id_) + " is written by process " +
                                  std::to_string(ProcessOf(writer).pid));
     }
     if (View(found.attachment.Address()).Format() != format_ ||
@@ -111,7 +106,7 @@ void Writer::Enlarge(std::uint32_t blocks) {
     const std::uint64_t needed = std::uint64_t{blocks} * kBlockBytes * kMinFrames * 2;
     geometry_.arena_bytes = std::min(std::max(geometry_.arena_bytes * 2, needed), kMaxArenaBytes);
     geometry_.index_slots = std::min(geometry_.index_slots * 2, kMaxIndexSlots);
-    base::LogInfo("ring of " + Name(id_) + " grows to " + std::to_string(geometry_.arena_bytes / 1024) + " KiB");
+    base::LogInfo("ring of " + NameOf(id_) + " grows to " + std::to_string(geometry_.arena_bytes / 1024) + " KiB");
     Close();
     Open();
 }

@@ -16,6 +16,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/ring/arena.h"
 #include "standalone/ring/segment.h"
+#include "standalone/ring/segment_keys.h"
 #include "standalone/ring/stream.h"
 
 namespace lookhaven::ring {

@@ -57,7 +57,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     } catch (const archive::ArchiveError&) {
     }
     try {
-        archive::FrameIndexReader index("/proc/self/fd/" + std::to_string(file.Get()));
+        archive::FrameIndexReader index(base::FileDescriptor(::dup(file.Get())), "");
         std::vector<archive::FrameEntry> frames;
         index.ReadNew(1 << 20, frames);
         Check(frames, 1 << 20);

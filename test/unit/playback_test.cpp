@@ -3,6 +3,7 @@
 // Playback: what a request reads, how it is answered, and how a session passes from player to player.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include "test/unit/scripted_player.h"
 
@@ -139,6 +140,29 @@ TEST(Playback, FailuresHaveTheirAnswers) {
                                                : "SetError(" + answer + ",{\"param1\":\"\",\"param2\":\"\"})");
             EXPECT_EQ(PidFile(), expected.pid_file);
         }
+    }
+}
+
+TEST(Playback, FollowsNothingThatWasPlantedInPlaceOfThePidFile) {
+    const std::string victim = "/tmp/player_victim." + kSession;
+    const std::pair<const char*, std::function<int()>> rows[] = {
+        {"a link", [&] { return symlink(victim.c_str(), kPidFile.c_str()); }},
+        {"another name of a file", [&] { return link(victim.c_str(), kPidFile.c_str()); }},
+        {"a pipe", [] { return mkfifo(kPidFile.c_str(), 0600); }},
+    };
+    for (const auto& [name, plant] : rows) {
+        SCOPED_TRACE(name);
+        Player player(kByIndex);
+        std::ofstream(victim) << getpid();
+        ASSERT_EQ(plant(), 0);
+        EXPECT_EQ(player.Run({}, 0), kRedirect);
+        ASSERT_EQ(player.logs.size(), 1U);
+        EXPECT_EQ(player.logs[0].text, "Failed to write pid file.\n");
+        EXPECT_EQ(CheckPlayerPidFile(), -1);
+        std::string kept;
+        std::ifstream(victim) >> kept;
+        EXPECT_EQ(kept, std::to_string(getpid()));
+        std::remove(victim.c_str());
     }
 }
 

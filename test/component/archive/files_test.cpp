@@ -1,10 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Names of files on mounts, the recording log, and the files that stand for spans.
+// Names of files on mounts, the recording log, the files that stand for spans, and links that others planted.
+#include <functional>
+#include <map>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
+#include "standalone/archive/file.h"
 #include "standalone/archive/recording_log.h"
+#include "standalone/archive/recording_reader.h"
+#include "standalone/archive/repair.h"
 #include "standalone/archive/span_file.h"
 #include "test/support/footage/archive_folder.h"
 
@@ -81,9 +89,92 @@ TEST(SpanFile, ReadsBackAndRefusesWhatIsNone) {
         Write(path, text);
         EXPECT_THROW(ReadSpan(path), ArchiveError) << text.substr(0, 200);
     }
-    EXPECT_THROW(ReadSpan(folder.Path()), ArchiveError);
+    EXPECT_THROW(ReadSpan(folder.Path()), std::system_error);
     EXPECT_THROW(ReadSpan(folder / "none.span"), std::system_error);
     EXPECT_THROW(WriteSpan(path, {0, 1, {"../x.mkv"}}), ArchiveError);
+}
+
+std::map<std::string, std::string> AllFiles(const std::filesystem::path& folder) {
+    std::map<std::string, std::string> files;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(folder)) {
+        files[entry.path()] = entry.is_regular_file() ? Contents(entry.path()) : "";
+    }
+    return files;
+}
+
+TEST(Files, NeitherLinksNorPipesLeadOutOfTheMount) {
+    namespace fs = std::filesystem;
+    constexpr std::int64_t kSecond = 1'709'251'199;
+    const FileName name{3, kSecond, 12, FileKind::kRecording};
+    const std::string day = DayOf(kSecond);
+    const std::string temporary = "235959-12.span." + std::to_string(::getpid()) + ".new";
+    const std::string files[] = {"235959-12.mkv", "235959-12.index", "235959-12.span", temporary, "seconds"};
+    struct Row {
+        const char* name;
+        std::function<void(const fs::path& camera, const fs::path& elsewhere)> plant;
+        bool is_refused = true;
+    };
+    for (const Row& row : {
+             Row{"the camera's folder is a link", [](auto&camera, auto&to) { fs::create_symlink(to, camera); }},
+             Row{"the day's folder is a link",
+                 [&](auto&camera, auto&to) {
+                     fs::create_directory(camera);
+                     fs::create_symlink(to / day, camera / day);
+                 }},
+             Row{"the files are links",
+                 [&](auto&camera, auto&to) {
+                     fs::create_directories(camera / day);
+                     for (const std::string& file : files) {
+                         fs::create_symlink(to / day / file, camera / day / file);
+                     }
+                 }},
+             Row{"the files are pipes",
+                 [&](auto&camera, auto&) {
+                     fs::create_directories(camera / day);
+                     for (const std::string& file : files) {
+                         ::mkfifo((camera / day / file).c_str(), 0600);
+                     }
+                 }},
+             Row{"nothing is planted", [](auto&camera, auto&to) { fs::copy(to, camera, fs::copy_options::recursive); },
+                 false},
+         }) {
+        SCOPED_TRACE(row.name);
+        const ArchiveFolder folder;
+        const fs::path elsewhere = folder / "elsewhere";
+        fs::create_directories(elsewhere / day);
+        Write(elsewhere / day / files[0], "footage");
+        FrameIndexWriter(elsewhere / day / files[1], PlainHeader(kSecond * 1000)).Finish();
+        WriteSpan(elsewhere / day / files[2], {1'000, 2'000, {day + "/" + files[0]}});
+        WriteRecordingLog(elsewhere, kSecond - 1, kSecond, 1);
+        const auto before = AllFiles(elsewhere);
+        fs::create_directory(folder / "disk");
+        fs::create_symlink(folder / "disk", folder / "mount");  // the owner's choice
+        row.plant(folder / "disk" / "3", elsewhere);
+
+        const fs::path recording = folder / "mount" / PathOf(name);
+        const auto is_refused = [](const auto& attempt) {
+            try {
+                attempt();
+                return false;
+            } catch (const std::system_error&) {
+                return true;
+            }
+        };
+        EXPECT_EQ(is_refused([&] { RecordingReader{recording}; }), row.is_refused);
+        EXPECT_EQ(is_refused([&] { FrameIndexReader{IndexPathOf(recording)}; }), row.is_refused);
+        EXPECT_EQ(is_refused([&] { ReadSpan(fs::path(recording).replace_extension(".span")); }), row.is_refused);
+        EXPECT_EQ(is_refused([&] { CloseCrashed(recording); }), row.is_refused);
+        EXPECT_EQ(is_refused([&] { WriteRecordingLog(folder / "mount" / "3", kSecond, kSecond + 1, 1); }),
+                  row.is_refused);
+        std::vector<std::uint8_t> second(1);
+        ReadRecordingLog(folder / "mount" / "3", kSecond - 1, second);
+        EXPECT_EQ(second[0], row.is_refused ? 0 : 1);
+        is_refused([&] { MakeFolderFor(folder / "mount", {3, kSecond + 86'400, 12, FileKind::kRecording}); });
+        is_refused([&] { FrameIndexWriter(IndexPathOf(recording), PlainHeader(0)); });
+        is_refused([&] { WriteSpan(fs::path(recording).replace_extension(".span"), {0, 1, {}}); });
+        RemoveFile(recording);
+        EXPECT_EQ(AllFiles(elsewhere), before);
+    }
 }
 
 }  // namespace

@@ -72,6 +72,7 @@ TEST_F(FileTest, AFailedReplacementLeavesTheOldFile) {
     const auto file = path_ / "settings";
     WriteFileAtomically(file, "old", 0640);
     EXPECT_THROW(WriteFileAtomically(path_ / "missing" / "settings", "new"), std::system_error);
+    std::filesystem::create_symlink("victim", path_ / ("settings." + std::to_string(::getpid()) + ".new"));
     WriteFileAtomically(file, std::string(100'000, 'x'));
     EXPECT_EQ(ReadFile(file), std::string(100'000, 'x'));
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(path_.Path()), {}), 1) << "no temporary file stays";
@@ -85,6 +86,8 @@ TEST_F(FileTest, TwoMappingsOfOneFileAreTheSameMemory) {
     EXPECT_EQ(static_cast<char*>(second.Data())[4000], 'z');
     EXPECT_EQ(std::filesystem::file_size(path_ / "shared"), 8192U) << "a smaller mapping does not cut the file";
     EXPECT_THROW(SharedMapping(path_ / "no" / "folder", 4096), std::system_error);
+    std::filesystem::create_symlink("shared", path_ / "link");
+    EXPECT_THROW(SharedMapping(path_ / "link", 4096), std::system_error);
 }
 
 TEST_F(FileTest, OneStateFolderIsOneInstallationUnderAnyName) {

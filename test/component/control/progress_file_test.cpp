@@ -10,6 +10,7 @@
 #include <vector>
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "test/support/folder.h"
@@ -83,7 +84,8 @@ TEST_F(ProgressFileTest, RefusesWhatIsNoProgressFile) {
     std::ofstream(folder_ / "2") << std::string(76, '\0');
     std::filesystem::create_symlink("/etc/passwd", folder_ / "3");
     std::filesystem::create_directory(folder_ / "4");
-    for (int key = 1; key <= 4; ++key) {
+    ::mkfifo((folder_ / "5").c_str(), 0600);
+    for (int key = 1; key <= 5; ++key) {
         EXPECT_FALSE(ProgressFile::Own(folder_, key, "aa")) << key;
         EXPECT_FALSE(ProgressFile::Open(folder_, key, "")) << key;
         ProgressFile::Sweep(folder_, key, 0);

@@ -92,6 +92,9 @@ TEST_F(ExportOf, NothingAndToNobodyFails) {
     archive::WriteSpan(folder_ / "1970-01-01/000010-5.span",
                        {kStartMs, kStartMs + 12'000, {"1970-01-01/000010-1.mkv", "1970-01-01/000018-4.mkv"}});
     EXPECT_THROW(libav.Copy(folder_ / "1970-01-01/000010-5.span", null.Get(), {}), SourceError) << "two formats";
+    std::filesystem::rename(recording, folder_ / "elsewhere.mkv");
+    std::filesystem::create_symlink(folder_ / "elsewhere.mkv", recording);
+    EXPECT_THROW(libav.Copy(recording, null.Get(), {}), std::system_error) << "a link";
 }
 
 }  // namespace

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Frames as cameras send them: parameter sets, pieces, sizes, and bytes that are no picture.
+#include <ctime>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -34,6 +36,15 @@ TEST(ParameterSets, StandBeforeEveryKeyFrame) {
     EXPECT_EQ(Text(h264.Complete(Bytes(aud + idr))), std::string("\0", 1) + new_sps + pps + aud + idr)
         << "the new ones";
     EXPECT_EQ(Text(h264.Complete(Bytes(sps + idr))), std::string("\0", 1) + new_sps + pps + sps + idr) << "half a set";
+    for (const std::string& set : {pps, sps + std::string(40'000, 'x')}) {
+        std::string flood = sps + pps;  // each with a number of its own
+        for (unsigned int i = 0; flood.size() < 1'000'000; ++i) {
+            flood += set + std::to_string(i + 1'000'000);
+        }
+        const std::clock_t begin = std::clock();
+        EXPECT_EQ(h264.Complete(Bytes(flood + idr)).size(), 12 + flood.size() + idr.size()) << "no sets of a camera";
+        EXPECT_LT(std::clock() - begin, CLOCKS_PER_SEC);
+    }
     ParameterSets h265(Codec::kH265, {});
     EXPECT_EQ(Text(h265.Complete(Bytes(idr265))), idr265);
     h265.Complete(Bytes(vps265 + sps265 + pps265 + idr265));

@@ -7,7 +7,7 @@
 #include <gmock/gmock.h>
 #include <sys/shm.h>
 
-#include "standalone/ring/segment.h"
+#include "standalone/ring/segment_keys.h"
 #include "test/component/ring/ring_fixture.h"
 
 namespace lookhaven::ring {
@@ -179,12 +179,13 @@ TEST_F(LifecycleTest, ForeignSegmentsAreRefusedAndReplaced) {
         bool is_replaced;
     };
     for (const Row& row : {
-             Row{"another layout", [](SegmentHead& head) { head.layout_version = 99; }, true, true},
-             Row{"more bytes than there are", [](SegmentHead& head) { head.segment_bytes += 4096; }, true, true},
-             Row{"an arena beyond the end", [](SegmentHead& head) { head.arena_blocks += 1; }, true, true},
-             Row{"an index beyond the end", [](SegmentHead& head) { head.index_slots = 9'999; }, true, true},
-             Row{"no index", [](SegmentHead& head) { head.index_slots = 0; }, true, true},
-             Row{"too long extra data", [](SegmentHead& head) { head.extra_length = 1025; }, true, true},
+             Row{"another layout", [](SegmentHead& head) { head.constants.layout_version = 99; }, true, true},
+             Row{"more bytes than there are", [](SegmentHead& head) { head.constants.segment_bytes += 4096; }, true,
+                 true},
+             Row{"an arena beyond the end", [](SegmentHead& head) { head.constants.arena_blocks += 1; }, true, true},
+             Row{"an index beyond the end", [](SegmentHead& head) { head.constants.index_slots = 9'999; }, true, true},
+             Row{"no index", [](SegmentHead& head) { head.constants.index_slots = 0; }, true, true},
+             Row{"too long extra data", [](SegmentHead& head) { head.constants.extra_length = 1025; }, true, true},
              Row{"another's magic", [](SegmentHead& head) { head.magic = 1234; }, false, false},
              Row{"killed before the magic", [](SegmentHead& head) { head.magic = 0; }, false, true},
          }) {
@@ -215,7 +216,7 @@ TEST_F(LifecycleTest, ADamagedRingIsReplacedAndItsViewersAreTold) {
         void (*damage)(const View&);
     };
     for (const Row& row : {
-             Row{"another size", [](const View& view) { view.Head().segment_bytes += 1; }},
+             Row{"another size", [](const View& view) { view.Head().constants.segment_bytes += 1; }},
              Row{"a newest count at the end of its range", [](const View& view) { view.Head().newest = ~0ULL; }},
              Row{"an index count at the end of its range", [](const View& view) { view.Slot(63).count = ~0ULL; }},
          }) {
@@ -246,15 +247,15 @@ TEST_F(LifecycleTest, AnotherStreamsSegmentUnderTheSameKeyIsLeftAlone) {
     ASSERT_GE(foreign, 0);
     const Attachment attachment(foreign);
     auto& head = *new (attachment.Address()) SegmentHead{};
-    head.layout_version = kLayoutVersion;
-    head.camera = 99;
+    head.constants.layout_version = kLayoutVersion;
+    head.constants.camera = 99;
     head.magic = kMagic;
     Writer writer = MakeWriter();
     Write(writer, 3);
     void* ring = Attach(installation_, kId);
     ASSERT_NE(ring, nullptr);
     EXPECT_TRUE(HasFrameOfThisStart(ring));
-    EXPECT_EQ(head.camera, 99);
+    EXPECT_EQ(head.constants.camera, 99);
     Detach(ring);
     attachment.RemoveSegment();
 }

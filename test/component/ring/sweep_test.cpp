@@ -11,7 +11,7 @@
 #include <sys/shm.h>
 #include <sys/syscall.h>
 
-#include "standalone/ring/segment.h"
+#include "standalone/ring/segment_keys.h"
 #include "test/component/ring/ring_fixture.h"
 
 namespace lookhaven::ring {
@@ -47,15 +47,17 @@ TEST_F(SweepTest, OnlyUnfinishedSegmentsOfOursAreRemoved) {
     };
     for (const Row& row : {
              Row{"killed before the first byte", 0600, 0, 0, true},
-             Row{"killed in the head", 0600, offsetof(SegmentHead, installation), installation_.Id(), true},
-             Row{"of another installation", 0600, offsetof(SegmentHead, installation), ~installation_.Id(), false},
+             Row{"killed in the head", 0600, offsetof(SegmentHead, constants.installation), installation_.Id(), true},
+             Row{"of another installation", 0600, offsetof(SegmentHead, constants.installation), ~installation_.Id(),
+                 false},
              Row{"another program's data", 0600, 512, 1, false},
              Row{"shared with other users", 0660, 0, 0, false},
          }) {
         SCOPED_TRACE(row.name);
         KilledChild creator([&] {
-            const Attachment made(::shmget(kUnusedRingKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | row.mode));
-            std::memcpy(static_cast<char*>(made.Address()) + row.written_offset, &row.written, sizeof row.written);
+            void* made =
+                ::shmat(::shmget(kUnusedRingKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | row.mode), nullptr, 0);
+            std::memcpy(static_cast<char*>(made) + row.written_offset, &row.written, sizeof row.written);
         });
         EXPECT_EQ(RemoveOrphans(installation_), 0U) << "its creator lives";
         creator.Kill();
