@@ -5,6 +5,8 @@
 #include <iostream>
 #include <memory>
 
+#include <grp.h>
+#include <sys/stat.h>
 #include <termios.h>
 #include <unistd.h>
 
@@ -58,7 +60,19 @@ std::string Console::HomePath() const {
     return home != nullptr && *home != '\0' ? home : "var";
 }
 
+void Console::BecomeOwner() const {
+    struct stat home {};
+    if (::geteuid() != 0 || ::stat(HomePath().c_str(), &home) != 0 || home.st_uid == 0) {
+        return;
+    }
+    if (::setgroups(0, nullptr) != 0 || ::setresgid(home.st_gid, home.st_gid, home.st_gid) != 0 ||
+        ::setresuid(home.st_uid, home.st_uid, home.st_uid) != 0) {
+        throw Failure(kNoPermission, "cannot become user ", home.st_uid, ", who owns the state folder ", HomePath());
+    }
+}
+
 base::Installation Console::Installation() const {
+    BecomeOwner();
     const std::string home = HomePath();
     if (::access(home.c_str(), F_OK) != 0) {
         throw Failure(kNoInput, "there is no state folder at ", home,

@@ -65,7 +65,10 @@ class Console {
     bool json = false;
 
     std::string HomePath() const;
-    // Throws Failure when there is no state folder.
+    // Root becomes the owner of the state folder for good, so that it leaves no files there that the server, which runs as
+    // that user, could not use. Does nothing where there is no folder yet. Throws Failure.
+    void BecomeOwner() const;
+    // BecomeOwner first. Throws Failure when there is no state folder.
     base::Installation Installation() const;
     // Throws Failure when the state folder is missing or not the caller's to change.
     store::Store OpenStore() const;

@@ -61,6 +61,7 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
 }
 
 void Init(const Console& console, const Request& request) {
+    console.BecomeOwner();
     const std::string& admin = request.admin;
     const base::Installation installation = CreateFolders(console.HomePath());
     const int steps = store::Store::Migrate(installation.StoreUrl());

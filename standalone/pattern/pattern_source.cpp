@@ -9,6 +9,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/text.h"
+#include "standalone/camera/isolated_source.h"
 #include "standalone/media/pace.h"
 #include "standalone/pattern/pattern_audio.h"
 #include "standalone/pattern/pattern_encoder.h"
@@ -146,7 +147,7 @@ std::unique_ptr<media::Source> OpenPattern(const std::string& url, const media::
 }
 
 media::SourceKinds AllSourceKinds() {
-    media::SourceKinds kinds = media::CameraKinds();
+    media::SourceKinds kinds = camera::IsolatedKinds();
     kinds.emplace("test:", OpenPattern);
     return kinds;
 }

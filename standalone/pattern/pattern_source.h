@@ -16,7 +16,7 @@ namespace lookhaven::pattern {
 std::unique_ptr<media::Source> OpenPattern(const std::string& url, const media::SourceOptions& options,
                                            std::stop_token stop);
 
-// media::CameraKinds and the test pattern ("test:").
+// camera::IsolatedKinds and the test pattern ("test:").
 media::SourceKinds AllSourceKinds();
 
 }  // namespace lookhaven::pattern

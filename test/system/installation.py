@@ -91,6 +91,7 @@ class Installation:
 
     def __init__(self, **environment):
         self._folder = tempfile.TemporaryDirectory(prefix="lookhaven-")
+        os.chmod(self._folder.name, 0o755)  # the server's account must reach what is in it
         self.home = pathlib.Path(environment.pop("LOOKHAVEN_HOME", f"{self._folder.name}/home"))
         self.port, self.tls_port = free_port(), free_port()
         self.environment = {

@@ -3,6 +3,7 @@
 # script/server: what it says when it cannot start, what it leaves behind, what it sets up.
 import os
 import pathlib
+import pwd
 import signal
 import socket
 import ssl
@@ -51,6 +52,8 @@ class ServerTest(unittest.TestCase):
                 ("folder too long for a socket", {"LOOKHAVEN_HOME": f"{folder}/{'a' * 90}"}, ["too long"]),
                 ("folder with a quote", {"LOOKHAVEN_HOME": f'{folder}/a"b'}, ['a"b', "LOOKHAVEN_HOME"]),
             ]
+            if os.geteuid() == 0:
+                rows.append(("folder of something else", {"LOOKHAVEN_HOME": folder}, [folder, "LOOKHAVEN_HOME"]))
             for name, environment, words in rows:
                 with self.subTest(name):
                     self.check_refusal(Installation(**environment), words, 5)
@@ -98,6 +101,32 @@ class ServerTest(unittest.TestCase):
             for folder in ("", "run", "tls", "log"):
                 self.assertEqual((server.home / folder).stat().st_mode & 0o077, 0, folder)
             self.assertEqual((server.home / "tls/key.pem").stat().st_mode & 0o077, 0)
+
+    @unittest.skipIf(os.geteuid() != 0, "needs root")
+    def test_root_hands_over_to_the_system_account_even_a_folder_that_it_made(self):
+        def owners(*paths):
+            return {path.lstat().st_uid for path in paths}
+
+        server = Installation()
+        with tempfile.TemporaryDirectory() as folder:
+            secret, mount = pathlib.Path(folder, "secret"), pathlib.Path(folder, "mount")
+            secret.touch()
+            mount.mkdir()
+            server.cli("init", "--admin", "admin", text="correct horse\n")
+            server.cli("mount", "add", str(mount))
+            (mount / "7").mkdir()
+            (mount / "photos").mkdir()
+            (server.home / "link").symlink_to(secret)
+            (mount / "7/link").symlink_to(secret)
+            self.assertEqual(owners(server.home, mount), {0})
+            with server:
+                self.assertIn("was root's", server.said())
+                account = pwd.getpwnam("lookhaven").pw_uid
+                parts = server.server.pid, *(server.part(name) for name in ("recorder", "webapi", "nginx"))
+                self.assertEqual(owners(*(pathlib.Path(f"/proc/{pid}") for pid in parts)), {account})
+                server.cli("camera", "add", "--name", "Shed", "--source", "test:mjpeg", "--type", "mjpeg")
+                self.assertEqual(owners(server.home, *server.home.rglob("*"), mount, *mount.glob("7/*")), {account})
+                self.assertEqual(owners(secret, mount / "photos"), {0})
 
     def test_https_on_every_address_and_http_on_loopback_only(self):
         with Installation() as server:

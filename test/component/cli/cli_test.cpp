@@ -3,6 +3,7 @@
 // The operator's command line: what each line answers, how it fails, and that no password ever shows.
 #include <fstream>
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/base/installation.h"
@@ -35,6 +36,26 @@ TEST_F(CliTest, WithoutAnInstallationEveryCommandSaysHowToMakeOneAndWrongUsePoin
           {"user passwd", 64, "lookhaven user passwd --help"},
           {"--help", 0, "doctor"},
           {"camera add --help", 0, "--low-source", "->"}});
+}
+
+TEST_F(CliTest, RootLeavesOnlyFilesThatTheOwnerOfTheStateFolderCanUse) {
+    if (::geteuid() != 0) {
+        GTEST_SKIP() << "needs root";
+    }
+    constexpr uid_t kNobody = 65534;
+    std::filesystem::permissions(folder_, std::filesystem::perms(0755));
+    std::filesystem::create_directory(home_);
+    ASSERT_EQ(::chown(home_.c_str(), kNobody, kNobody), 0);
+    Play({{"init --admin admin", 0, "Added account admin", "", "admin-s3cret\n"},
+          {"demo setup", 0, "", "", "viewer-s3cret\n"},
+          {"log set debug", 0, ""},
+          {"mount add " + folder_.Path().string(), 77, ""}});
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(home_)) {
+        struct stat status {};
+        EXPECT_EQ(::lstat(entry.path().c_str(), &status), 0);
+        EXPECT_EQ(status.st_uid, kNobody) << entry.path();
+        EXPECT_EQ(status.st_gid, kNobody) << entry.path();
+    }
 }
 
 TEST_F(CliTest, SetUpIsRepeatableAndKeepsWhatIsThere) {

@@ -3,6 +3,7 @@
 
 #include <csignal>
 #include <cstdlib>
+#include <fstream>
 
 #include <fcntl.h>
 #include <sys/prctl.h>
@@ -55,6 +56,17 @@ std::optional<int> Child::Wait(std::chrono::milliseconds limit) {
 std::size_t Child::Count(const char* kind) const {
     const std::filesystem::directory_iterator entries("/proc/" + std::to_string(pid_) + "/" + kind);
     return static_cast<std::size_t>(std::distance(begin(entries), end(entries)));
+}
+
+std::vector<pid_t> Child::Children() const {
+    std::vector<pid_t> children;
+    for (const auto& thread : std::filesystem::directory_iterator("/proc/" + std::to_string(pid_) + "/task")) {
+        std::ifstream file(thread.path() / "children");
+        for (pid_t child = 0; file >> child;) {
+            children.push_back(child);
+        }
+    }
+    return children;
 }
 
 Viewer::Viewer(const base::Installation& installation, int camera, base::Medium medium)

@@ -34,6 +34,7 @@ class Child {
     std::optional<int> Wait(std::chrono::milliseconds limit = std::chrono::seconds(10));
     // How many descriptors ("fd") or threads ("task") it has.
     std::size_t Count(const char* kind) const;
+    std::vector<pid_t> Children() const;
 
   private:
     pid_t pid_;

@@ -7,6 +7,8 @@
 #include <sys/wait.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/base/process.h"
 #include "test/component/recorder/recorder_fixture.h"
 #include "test/support/camera/mjpeg_camera.h"
 
@@ -107,6 +109,36 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     }
     EXPECT_EQ(Segments(), 1u);
     EXPECT_EQ(LogLines("does not answer with Motion JPEG"), 1u) << "a line for each attempt";
+}
+
+TEST_F(RecorderTest, ProcessOfACameraIsConfinedAndItsDeathIsThatCamerasTrouble) {
+    MjpegCamera guarded("viewer:se/cr@t");
+    Viewer viewer(*installation_, AddCamera(guarded.Url(), store::Credentials{"viewer", "se/cr@t"}));
+    Viewer other(*installation_, AddCamera(kSmallPattern));
+    Child recorder = StartRecorder();
+    other.Next();
+    pid_t last = 0;
+    for (const int signal : {SIGABRT, SIGSTOP, SIGKILL}) {
+        SCOPED_TRACE(signal);
+        ASSERT_GE(MjpegCamera::NumberOf(viewer.Next().data), 0);
+        const std::vector<pid_t> children = recorder.Children();
+        ASSERT_EQ(children.size(), 1u);
+        ASSERT_NE(std::exchange(last, children[0]), children[0]);
+        const std::string process = "/proc/" + std::to_string(last);
+        const std::string status = base::ReadFile(process + "/status");
+        EXPECT_NE(status.find("Seccomp:\t2"), status.npos);
+        EXPECT_NE(status.find("NoNewPrivs:\t1"), status.npos);
+        EXPECT_EQ(base::ReadFile(process + "/cmdline"), std::string("lookhaven-camera\0", 17));
+        ASSERT_EQ(::kill(last, signal), 0);
+        ASSERT_TRUE(Eventually([&] { return !viewer.HasPicture(); }));
+        EXPECT_TRUE(other.HasPicture());
+    }
+    EXPECT_EQ(LogLines("its process was ended by signal 6 (") + LogLines("its process was ended by signal 9"), 2u);
+    EXPECT_EQ(LogLines("no picture for 1000 ms"), 1u) << "a process that hangs";
+    viewer.Next();
+    last = recorder.Children().at(0);
+    recorder.Signal(SIGKILL);
+    EXPECT_TRUE(Eventually([&] { return base::ProcessStartTicks(last) == 0; })) << "outlives the recorder";
 }
 
 TEST_F(RecorderTest, StreamRunsWhileItIsRequested) {
