@@ -6,6 +6,9 @@
 #include <stdexcept>
 #include <system_error>
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include "standalone/base/process.h"
 
 namespace lookhaven::control {
@@ -19,6 +22,17 @@ std::filesystem::path ConfigPath(const base::Installation& installation) {
     return installation.Home() / "debug-log";
 }
 
+// Readers take only a file of the exact size. A shorter one is lengthened when it is mapped.
+base::FileDescriptor LockAtSize(const std::filesystem::path& path) {
+    base::FileDescriptor file = base::LockFile(path);
+    struct stat status {};
+    if (::fstat(file.Get(), &status) != 0 ||
+        (status.st_size > off_t{sizeof(DebugLogConfig)} && ::ftruncate(file.Get(), sizeof(DebugLogConfig)) != 0)) {
+        base::ThrowErrno("cannot cut " + path.string());
+    }
+    return file;
+}
+
 }  // namespace
 
 const DebugLogConfig* MapDebugLog(const base::Installation& installation) try {
@@ -29,7 +43,7 @@ const DebugLogConfig* MapDebugLog(const base::Installation& installation) try {
 }
 
 DebugLogEditor::DebugLogEditor(const base::Installation& installation)
-    : lock_(base::LockFile(ConfigPath(installation))),
+    : lock_(LockAtSize(ConfigPath(installation))),
       config_(MappedTable<DebugLogConfig>::OpenOrCreate(ConfigPath(installation))) {
     if (config_->version != kVersion) {
         config_->process_count = 0;
