@@ -16,8 +16,8 @@ namespace lookhaven::api {
 using Parameters = std::map<std::string, Json::Value>;
 
 // The parameters of the query string; the last of two of one name counts. Throws http::Failure 400 for a broken escape,
-// a text that is not UTF-8 or holds a NUL, too many parameters, and when one of "api", "version", "method" is named
-// twice after unescaping: the web server, which limits log-ins, and this host must see the same api.
+// a text that is not UTF-8 or holds a NUL (inside of JSON too), too many parameters, and when one of "api", "version",
+// "method" is named twice after unescaping: the web server, which limits log-ins, and this host must see the same api.
 Parameters ReadQuery(const http::Request& request);
 
 // Adds those of a POST's form or JSON body, which replace the query's. Throws as ReadQuery does, and http::Failure 400

@@ -28,7 +28,6 @@ constexpr std::uint32_t kVersion = 1;
 constexpr std::uint32_t kKeyFlag = 1;
 constexpr int kMaxSidePixels = 16384;
 constexpr std::int64_t kMaxWallMs = 253'402'300'800'000;  // the year 10000
-constexpr std::uint32_t kMaxTimeMs = (base::kMaxRecordingSeconds + 60) * 1000;
 
 struct RawHeader {
     std::array<char, 8> magic = kMagic;
@@ -54,7 +53,7 @@ struct RawEntry {
 };
 static_assert(sizeof(RawEntry) == 24);
 
-constexpr off_t kMaxFileBytes = sizeof(RawHeader) + off_t{sizeof(RawEntry)} * kMaxTimeMs;
+constexpr off_t kMaxFileBytes = sizeof(RawHeader) + off_t{sizeof(RawEntry)} * kMaxFrameTimeMs;
 
 // FNV-1a by words with extra mixing: any changed word or byte changes it, and it is not 0 for zeros.
 std::uint32_t Checksum(const void* data, std::size_t size) {
@@ -116,7 +115,9 @@ struct flock WholeFile(short type) {
     return lock;
 }
 
-bool IsKnown(const IndexHeader& header) {
+}  // namespace
+
+bool IsPossible(const IndexHeader& header) {
     const auto is_one_of = [](const std::string& name, std::initializer_list<const char*> names) {
         return std::find(names.begin(), names.end(), name) != names.end();
     };
@@ -125,8 +126,6 @@ bool IsKnown(const IndexHeader& header) {
            header.width <= kMaxSidePixels && header.height > 0 && header.height <= kMaxSidePixels &&
            header.start_wall_ms >= 0 && header.start_wall_ms < kMaxWallMs;
 }
-
-}  // namespace
 
 std::int64_t DurationMs(std::int64_t frame_count, std::int64_t last_time_ms) {
     if (frame_count == 0) {
@@ -207,7 +206,7 @@ FrameIndexReader::FrameIndexReader(base::FileDescriptor file, std::string path)
         throw ArchiveError(path_ + " is a frame index of another version");
     }
     header_ = {Text(raw.codec), Text(raw.audio_codec), raw.width, raw.height, raw.start_wall_ms, raw.reason};
-    if (raw.check != CheckOf(raw) || raw.finished > 1 || !IsKnown(header_)) {
+    if (raw.check != CheckOf(raw) || raw.finished > 1 || !IsPossible(header_)) {
         throw ArchiveError(path_ + " has a damaged head");
     }
 }
@@ -228,7 +227,7 @@ void FrameIndexReader::ReadNew(std::uint64_t recording_bytes, std::vector<FrameE
             }
             const bool usable = raw.size > 0 && raw.size <= base::kMaxFrameBytes &&
                                 raw.offset < (std::uint64_t{1} << 62) && raw.offset >= frames_end_ &&
-                                raw.time_ms <= kMaxTimeMs && (frames_end_ > 0 || (raw.flags & kKeyFlag) != 0);
+                                raw.time_ms <= kMaxFrameTimeMs && (frames_end_ > 0 || (raw.flags & kKeyFlag) != 0);
             if (torn || !usable) {
                 throw ArchiveError(path_ + " is damaged");
             }

@@ -18,6 +18,7 @@
 
 #include "standalone/archive/archive_error.h"
 #include "standalone/base/file_descriptor.h"
+#include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
@@ -32,10 +33,16 @@ struct IndexHeader {
     bool operator==(const IndexHeader&) const = default;
 };
 
+// Whether it can be a recording's: codecs that are known, a size and a start that are possible. A reader refuses others.
+bool IsPossible(const IndexHeader& header);
+
+// Readers take a frame with a later time for damage.
+constexpr std::uint32_t kMaxFrameTimeMs = (base::kMaxRecordingSeconds + 60) * 1000;
+
 struct FrameEntry {
     std::uint64_t offset = 0;   // of the frame's first byte in the recording
     std::uint32_t size = 0;     // bytes, 1 … base::kMaxFrameBytes
-    std::uint32_t time_ms = 0;  // presentation time, from the recording's start
+    std::uint32_t time_ms = 0;  // presentation time, from the recording's start; at most kMaxFrameTimeMs
     bool key = false;           // decodable without the frames before it
 
     bool operator==(const FrameEntry&) const = default;

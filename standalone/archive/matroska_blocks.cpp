@@ -193,7 +193,7 @@ void MatroskaBlocks::ReadHead() {
         }
         position_ = child->end;
     }
-    if (header_.codec.empty()) {
+    if (!IsPossible(header_)) {
         throw ArchiveError("a Matroska file without a video track that is known");
     }
 }
@@ -319,7 +319,7 @@ bool MatroskaBlocks::ReadBlock(const Element& block, std::uint64_t cluster_time,
         return false;
     }
     const std::uint64_t time_ms = static_cast<std::uint64_t>(time) * timestamp_scale_ns_ / 1'000'000;
-    if (time_ms > UINT32_MAX) {
+    if (time_ms > kMaxFrameTimeMs) {
         return false;
     }
     frames.push_back({frame, static_cast<std::uint32_t>(block.end - frame), static_cast<std::uint32_t>(time_ms),

@@ -22,7 +22,7 @@ namespace lookhaven::archive {
 class MatroskaBlocks {
   public:
     // Reads everything before the first cluster. Borrows the descriptor. Throws ArchiveError when this is no Matroska
-    // file with a video track in a supported codec; std::system_error.
+    // file with a video track in a supported codec and of a possible size; std::system_error.
     explicit MatroskaBlocks(int file);
 
     // From the file; the reason is always 0, and the start is 0 when the file does not say.

@@ -31,23 +31,40 @@ std::optional<Json::Value> StrictJson(const std::string& text) {
 constexpr unsigned int kAllDigits = 17;
 constexpr unsigned int kSafeDigits = 15;  // the most that every decimal fraction keeps
 
-std::string CompactText(const Json::Value& value, unsigned int digits) {
+Json::StreamWriterBuilder CompactStyle(unsigned int digits) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
     builder["emitUTF8"] = true;
     builder["precision"] = digits;
-    return Json::writeString(builder, value);
+    return builder;
 }
 
+std::string CompactText(const Json::Value& value) {
+    return Json::writeString(CompactStyle(kAllDigits), value);
+}
+
+// Writes one value after the other. To make a writer costs more than to write a number.
+class ScalarWriter {
+  public:
+    std::string TextOf(const Json::Value& scalar) {
+        stream_.str({});
+        writer_->write(scalar, &stream_);
+        return stream_.str();
+    }
+
+  private:
+    std::unique_ptr<Json::StreamWriter> writer_{CompactStyle(kSafeDigits).newStreamWriter()};
+    std::ostringstream stream_;
+};
+
 // True when writing each value inside text gives the same text again; spaces and the order of names are free.
-bool IsReproduced(const Json::Value& value, std::string_view text) {
+bool IsReproduced(const Json::Value& value, std::string_view text, ScalarWriter& writer) {
     if (value.isObject() || value.isArray()) {
         return std::all_of(value.begin(), value.end(),
-                           [text](const Json::Value& member) { return IsReproduced(member, text); });
+                           [&](const Json::Value& member) { return IsReproduced(member, text, writer); });
     }
     const auto start = static_cast<std::size_t>(value.getOffsetStart());
-    return CompactText(value, kSafeDigits) ==
-           text.substr(start, static_cast<std::size_t>(value.getOffsetLimit()) - start);
+    return writer.TextOf(value) == text.substr(start, static_cast<std::size_t>(value.getOffsetLimit()) - start);
 }
 
 }  // namespace
@@ -63,7 +80,8 @@ Json::Value JsonFromText(std::string_view name, const std::string& text) {
     if (!text.empty() && kFirstBytes.find(text.front()) != kFirstBytes.npos && !IsAlwaysText(name)) {
         std::optional<Json::Value> value = StrictJson(text);
         const bool is_scalar = value && !value->isObject() && !value->isArray();
-        if (value && (is_scalar ? CompactText(*value, kSafeDigits) == text : IsReproduced(*value, text))) {
+        ScalarWriter writer;
+        if (value && (is_scalar ? writer.TextOf(*value) == text : IsReproduced(*value, text, writer))) {
             return *std::move(value);
         }
     }
@@ -71,7 +89,7 @@ Json::Value JsonFromText(std::string_view name, const std::string& text) {
 }
 
 std::string SuccessText(const Json::Value& data) {
-    return "{\"data\":" + CompactText(data, kAllDigits) + ",\"success\":true}";
+    return "{\"data\":" + CompactText(data) + ",\"success\":true}";
 }
 
 }  // namespace lookhaven::binding
@@ -141,8 +159,8 @@ void APIResponse::SetSuccess(const Json::Value& data) {
 }
 
 void APIResponse::SetError(int code, const Json::Value& data) {
-    m_pContext->answer = R"({"error":{"code":)" + std::to_string(code) + R"(,"data":)" + CompactText(data, kAllDigits) +
-                         R"(},"success":false})";
+    m_pContext->answer =
+        R"({"error":{"code":)" + std::to_string(code) + R"(,"data":)" + CompactText(data) + R"(},"success":false})";
 }
 
 void APIResponse::SetEnableOutput(bool enable) {

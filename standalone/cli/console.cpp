@@ -3,7 +3,6 @@
 
 #include <cstdlib>
 #include <iostream>
-#include <memory>
 
 #include <grp.h>
 #include <sys/stat.h>
@@ -103,26 +102,6 @@ std::string ReadPassword(const std::string& account, bool is_new) {
         throw Failure(kDataError, "the two passwords differ: nothing was changed");
     }
     return password;
-}
-
-std::string ToJson(const Json::Value& value) {
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "  ";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, value);
-}
-
-Json::Value ParseJson(const std::string& text) {
-    Json::CharReaderBuilder builder;
-    builder["stackLimit"] = 8;
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    Json::Value value;
-    std::string ignored;
-    try {
-        return reader->parse(text.data(), text.data() + text.size(), &value, &ignored) ? value : Json::Value();
-    } catch (const Json::Exception&) {
-        return {};  // nested too deeply
-    }
 }
 
 }  // namespace lookhaven::cli

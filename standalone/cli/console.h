@@ -10,9 +10,8 @@
 #include <string_view>
 #include <utility>
 
-#include <json/json.h>
-
 #include "standalone/base/installation.h"
+#include "standalone/cli/json.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::cli {
@@ -86,30 +85,5 @@ class Console {
 // Asks on the terminal without echo (twice when the password is new), or reads one line when standard input is no
 // terminal. Throws Failure when there is none.
 std::string ReadPassword(const std::string& account, bool is_new);
-
-std::string ToJson(const Json::Value& value);
-// Null for what is no JSON or nested too deeply.
-Json::Value ParseJson(const std::string& text);
-
-// An object of names, each followed by its value: Object("id", 5, "name", "Gate").
-inline Json::Value Object() {
-    return Json::objectValue;
-}
-template <typename Value, typename... Members>
-Json::Value Object(const char* name, const Value& value, const Members&... members) {
-    Json::Value object = Object(members...);
-    object[name] = value;
-    return object;
-}
-
-// What data_of makes of each record.
-template <typename Records, typename DataOf>
-Json::Value Array(const Records& records, DataOf data_of) {
-    Json::Value array(Json::arrayValue);
-    for (const auto& record : records) {
-        array.append(data_of(record));
-    }
-    return array;
-}
 
 }  // namespace lookhaven::cli

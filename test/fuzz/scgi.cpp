@@ -1,34 +1,27 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Feeds the SCGI parser any bytes, whole and cut in two: both ways must come to the same end.
-#include <algorithm>
-#include <cstdint>
-#include <cstdlib>
-#include <string_view>
-
 #include "standalone/host/scgi.h"
 
+#include "test/fuzz/fuzz.h"
+
+using lookhaven::fuzz::Require;
 using lookhaven::host::ScgiParser;
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    if (size < 2) {
-        return 0;
-    }
-    const std::size_t cut = (std::size_t{data[0]} << 8 | data[1]) % size;
-    const std::string_view bytes(reinterpret_cast<const char*>(data) + 2, size - 2);
+    lookhaven::fuzz::Input input(data, size);
+    const std::size_t cut = input.Take<std::uint16_t>();
+    const std::string_view bytes = lookhaven::fuzz::Text(input.Rest());
     ScgiParser whole;
     ScgiParser halves;
     const ScgiParser::State state = whole.Feed(bytes);
-    halves.Feed(bytes.substr(0, std::min(cut, bytes.size())));
-    if (halves.Feed(bytes.substr(std::min(cut, bytes.size()))) != state) {
-        std::abort();
-    }
+    halves.Feed(bytes.substr(0, cut));
+    Require(halves.Feed(bytes.substr(std::min(cut, bytes.size()))) == state);
+    Require(whole.Problem() == halves.Problem());
     if (state == ScgiParser::State::kComplete) {
         const auto one = whole.TakeRequest();
         const auto other = halves.TakeRequest();
-        if (one.headers != other.headers || one.body != other.body) {
-            std::abort();
-        }
+        Require(one.headers == other.headers && one.body == other.body);
     }
     return 0;
 }
