@@ -7,9 +7,9 @@
 #include "platform/camera/camera.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/base/clock.h"
-#include "standalone/binding/pair_token.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 
@@ -88,7 +88,7 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
             if (!server.address.empty()) {
                 const std::string secret = may_have_token ? Servers().FindSecret(server.id) : "";
                 const std::string cookie =
-                    secret.empty() ? "" : timestamp + "-" + lookhaven::binding::MakePairToken(secret, timestamp);
+                    secret.empty() ? "" : timestamp + "-" + store::MakePairToken(secret, timestamp);
                 m_Servers.emplace(server.id, SlaveHx(server.address, server.port, cookie));
             }
         }
@@ -113,7 +113,7 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
         const std::int64_t now = UtcSeconds();
         bool matches = false;
         for (const std::string& secret : Servers().InboundPeerSecrets()) {
-            matches |= lookhaven::binding::PairTokenMatches(cookie, timestamp, secret, now);
+            matches |= store::PairTokenMatches(cookie, timestamp, secret, now);
         }
         if (matches) {
             RequestContext::Current().SetCaller(PAIR_AUTH_UID);

@@ -11,8 +11,8 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
-#include "standalone/binding/pair_token.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/users.h"
@@ -114,7 +114,7 @@ TEST(Peers, AreOneUserTogether) {
     std::vector<base::FileDescriptor> running;
     const auto open = [&](const std::string& secret) {
         return host.OpenQuery("api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=PeerStream&timestamp=" + now +
-                                  "&cookie=" + binding::MakePairToken(secret, now),
+                                  "&cookie=" + store::MakePairToken(secret, now),
                               "");
     };
     store::RecordingServer peer;

@@ -12,7 +12,7 @@
 #include "platform/emap/device.h"
 #include "platform/emap/emap.h"
 #include "platform/privilege/privprofile.h"
-#include "standalone/binding/pair_token.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/emap/pictures.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
@@ -181,7 +181,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     const std::string timestamp = cookie.substr(0, cookie.find('-'));
     EXPECT_EQ(cookie.find(kSecret), std::string::npos);
     const std::string token = cookie.substr(timestamp.size() + 1);
-    EXPECT_EQ(token, MakePairToken(kSecret, timestamp));
+    EXPECT_EQ(token, store::MakePairToken(kSecret, timestamp));
     EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "what is shown to another host opens nothing here";
     for (const unsigned int caller : {2U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
         Call(caller);
@@ -189,16 +189,16 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     }
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
-    EXPECT_FALSE(SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'e'), timestamp), timestamp));
+    EXPECT_FALSE(SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
-    EXPECT_TRUE(SlaveHxAuthentication().IsAuthByPairMatch(MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+    EXPECT_TRUE(SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
 }
 
 TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
     constexpr std::int64_t kNow = 1'800'000'000;
     const std::string now = "1800000000";
-    const std::string token = MakePairToken(kSecret, now);
+    const std::string token = store::MakePairToken(kSecret, now);
     std::string flipped = token;
     flipped.back() = flipped.back() == '0' ? '1' : '0';
     const struct {
@@ -216,15 +216,15 @@ TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
                 {token.substr(1), now, kSecret, kNow, false},
                 {token, now, "", kNow, false},
                 {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
-                {MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
-                {MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
-                {MakePairToken(kSecret, ""), "", kSecret, 0, false}};
+                {store::MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
+                {store::MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
+                {store::MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
+                {store::MakePairToken(kSecret, ""), "", kSecret, 0, false}};
     for (const auto& row : rows) {
-        EXPECT_EQ(PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
+        EXPECT_EQ(store::PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
             << row.timestamp << " at " << row.at;
     }
-    EXPECT_THROW(MakePairToken("", now), std::invalid_argument);
+    EXPECT_THROW(store::MakePairToken("", now), std::invalid_argument);
 }
 
 }  // namespace

@@ -10,19 +10,16 @@
 #include <string>
 #include <string_view>
 
-#include "platform/export.h"
-
-namespace lookhaven::binding {
+namespace lookhaven::store {
 
 // How far the two hosts' clocks, and a token's age, may be apart.
 constexpr std::int64_t kPairTokenWindowSeconds = 300;
 
 // secret: 64 hex digits, else std::invalid_argument is thrown.
-LH_PLATFORM_API std::string MakePairToken(std::string_view secret, std::string_view timestamp);
+std::string MakePairToken(std::string_view secret, std::string_view timestamp);
 
 // Whether the token was made with the secret for the timestamp, and the timestamp is within the window around now.
 // False for anything malformed, an empty secret too. Takes the same time whatever byte of the token is wrong.
-LH_PLATFORM_API bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret,
-                                      std::int64_t now_s);
+bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s);
 
-}  // namespace lookhaven::binding
+}  // namespace lookhaven::store
