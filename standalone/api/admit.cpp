@@ -101,8 +101,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
 }
 
 void Admit(const Call& call, const RequestLimits& limits) {
-    const Json::Value& priv_data = call.Parameter("privData");
-    call.context.RestrictByPrivData(binding::CamerasDeniedBy(priv_data), binding::SoundDeniedBy(priv_data));
+    call.context.Restrict(binding::RestrictionsOf(call.Parameter("privData")));
     if (!call.login) {
         if (call.api != kSelfAdmittingApi) {
             throw Failure(401, "no session");

@@ -16,8 +16,8 @@
 
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
-#include "platform/privilege/privprofile.h"
 #include "standalone/base/log.h"
+#include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
 
@@ -76,12 +76,9 @@ std::string Get(const Call& call) {
     if (id <= 0) {
         throw Failure(400, "camera must be the id of a camera");
     }
-    if (PrivProfileGetByUid(call.context.Caller()).GetInaCamIdSet(CAM_PRIV_LIVEVIEW, false).contains(id)) {
-        throw Failure(403, "you may not see this camera");
-    }
     Camera camera;
-    if (camera.Load(id, 0, 0) != 0) {
-        throw Failure(404, "there is no such camera");
+    if (!binding::MayUse(id, store::CameraAccess::kLive) || camera.Load(id, 0, 0) != 0) {
+        throw Failure(404, kNoSuchCamera);
     }
     const Json::Value& asked = call.Parameter("profileType");
     const auto profile = asked.isNull() ? CAM_PROFILE_DEFAULT : static_cast<CAM_PROFILE_TYPE>(asked.asInt());

@@ -12,9 +12,9 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
-#include "standalone/store/pair_token.h"
 #include "standalone/binding/rights.h"
 #include "standalone/remote/live_view.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::api {
@@ -65,11 +65,9 @@ std::string Play(const Call& call) {
     const auto server = servers.Find(server_id);
     const auto camera = servers.FindCamera(server_id, call.Parameter("camera").asInt());
     const std::string secret = servers.FindSecret(server_id);
-    if (!server || !camera || server->address.empty() || secret.empty()) {
-        throw Failure(404, "there is no such camera on a recording server");
-    }
-    if (!binding::MayUse(camera->id, store::CameraAccess::kLive)) {
-        throw Failure(403, "you may not see this camera");
+    if (!server || !camera || server->address.empty() || secret.empty() ||
+        !binding::MayUse(camera->id, store::CameraAccess::kLive)) {
+        throw Failure(404, kNoSuchCamera);
     }
     const std::string id = std::to_string(camera->id_on_server);
     const std::string timestamp = std::to_string(base::WallMillis() / 1000);

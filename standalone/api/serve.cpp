@@ -66,6 +66,9 @@ Call ReadCall(http::Request& request, control::SlotTable& slots, control::Slot& 
 std::string RunModule(EntryFunction entry, const Call& call) {
     VEXO::APIRequest::Context asked{call.parameters, call.cookies, call.method,
                                     std::string(call.request.Header("REMOTE_ADDR")), call.login};
+    if (asked.login && call.context.RequestRestrictions().privilege > store::Privilege::kManager) {
+        asked.login->is_manager = false;
+    }
     VEXO::APIRequest request(asked);
     VEXO::APIResponse::Context given;
     VEXO::APIResponse response(given);

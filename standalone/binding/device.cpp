@@ -6,6 +6,7 @@
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/camera_record.h"
 #include "standalone/binding/request_context.h"
+#include "standalone/binding/rights.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
 
@@ -35,6 +36,11 @@ int IdOnServer(int camera_id, int server_id) {
     }
     const auto remote = Servers().FindCamera(camera_id);
     return remote && remote->server_id == server_id ? remote->id_on_server : 0;
+}
+
+// The camera that watches a device, as far as the caller may know it: 0 for one that is denied.
+int Watching(int camera_id) {
+    return camera_id != 0 && lookhaven::binding::MayUse(camera_id, store::CameraAccess::kLive) ? camera_id : kNoDevice;
 }
 
 std::map<int, store::PortCounts> PortsOf(const std::string& ids) {
@@ -82,7 +88,7 @@ int POS::LoadByIdOnRecServer(int idOnServer, int serverId) {
         if (!found) {
             return kNotFound;
         }
-        m_PairedCamIdOnRec = IdOnServer(found->camera_id, serverId);
+        m_PairedCamIdOnRec = IdOnServer(Watching(found->camera_id), serverId);
         return 0;
     });
 }
@@ -138,13 +144,14 @@ void GetPairedCam(int moduleId, int portIdx, int& camId, int& camServerId, int& 
     OrFailure("GetPairedCam", 0, [&] {
         const auto module = Devices().Find(EmapItemType::kIoModule, moduleId).value_or(store::Device());
         const auto port = module.ports.find(portIdx);
-        if (port == module.ports.end() || port->second.camera_id == 0) {
+        const int camera = port == module.ports.end() ? kNoDevice : Watching(port->second.camera_id);
+        if (camera == kNoDevice) {
             return 0;
         }
-        const auto remote = Servers().FindCamera(port->second.camera_id);
+        const auto remote = Servers().FindCamera(camera);
         camServerId = remote ? remote->server_id : 0;
-        camIdOnServer = remote ? remote->id_on_server : port->second.camera_id;
-        camId = port->second.camera_id;
+        camIdOnServer = remote ? remote->id_on_server : camera;
+        camId = camera;
         return 0;
     });
 }

@@ -3,6 +3,7 @@
 // E-maps with the items placed on them, as far as the caller may see the map.
 #include "platform/emap/emap.h"
 
+#include "platform/emap/device.h"
 #include "standalone/base/text.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
@@ -22,6 +23,15 @@ static_assert(static_cast<int>(store::EmapItemType::kPos) == EMAP_ITEM_POS);
 namespace {
 
 constexpr int kNotFound = -1;
+
+// For a paired host the module leaves no item out by itself.
+void LeaveOutDeniedCameras(std::vector<store::EmapItem>& items) {
+    const std::set<int> denied = lookhaven::binding::DeniedCameras(store::CameraAccess::kLive);
+    std::erase_if(items, [&denied](const store::EmapItem& item) {
+        return item.type == store::EmapItemType::kCamera && !denied.empty() &&
+               denied.contains(item.server_id == 0 ? item.device_id : GetCamIdOnHost(item.server_id, item.device_id));
+    });
+}
 
 }  // namespace
 
@@ -44,6 +54,7 @@ int Emap::Load(int emapId) {
             return kNotFound;
         }
         *m_pRecord = {*found, emaps.Items(emapId)};
+        LeaveOutDeniedCameras(m_pRecord->items);
         return 0;
     });
 }

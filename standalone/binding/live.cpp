@@ -108,8 +108,11 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
     RequestContext& context = RequestContext::Current();
     context.NotePicture();
     void* stream = OrFailure<void*>("LiveStreamFifoAt", nullptr, [&]() -> void* {
-        if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo) ||
-            !MayUse(camId, store::CameraAccess::kLive)) {
+        if (!MayUse(camId, store::CameraAccess::kLive)) {
+            context.NoteHidden();
+            return nullptr;
+        }
+        if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo)) {
             return nullptr;
         }
         context.GrantStream({camId, streamNo}, MayUse(camId, store::CameraAccess::kAudio));

@@ -39,30 +39,34 @@ void RequireKnownShape(const Json::Value& priv_data) {
 
 std::set<int> IdsUnder(const Json::Value& priv_data, const char* member) {
     std::set<int> cameras;
-    if (!priv_data.isNull()) {
-        RequireKnownShape(priv_data);
-        for (const Json::Value& camera : priv_data[member]) {
-            cameras.insert(camera.asInt());
-        }
+    for (const Json::Value& camera : priv_data[member]) {
+        cameras.insert(camera.asInt());
     }
     return cameras;
 }
 
 }  // namespace
 
-std::set<int> CamerasDeniedBy(const Json::Value& priv_data) {
-    return IdsUnder(priv_data, "deniedCameras");
+void Restrictions::AddTo(std::set<int>& denied, store::CameraAccess kind) const {
+    denied.insert(cameras.begin(), cameras.end());
+    if (kind == store::CameraAccess::kAudio) {
+        denied.insert(sound.begin(), sound.end());
+    }
 }
 
-std::set<int> SoundDeniedBy(const Json::Value& priv_data) {
-    return IdsUnder(priv_data, "deniedAudio");
+Restrictions RestrictionsOf(const Json::Value& priv_data) {
+    if (priv_data.isNull()) {
+        return {};
+    }
+    RequireKnownShape(priv_data);
+    return {IdsUnder(priv_data, "deniedCameras"), IdsUnder(priv_data, "deniedAudio"),
+            static_cast<store::Privilege>(std::max(0, priv_data.get("privilege", 0).asInt()))};
 }
 
 bool MayUse(int camera, store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
     const unsigned int caller = context.Caller();
-    if (caller == 0 || context.CamerasDeniedByRequest().contains(camera) ||
-        (kind == store::CameraAccess::kAudio && context.SoundDeniedByRequest().contains(camera))) {
+    if (caller == 0 || context.RequestRestrictions().IsDenied(camera, kind)) {
         return false;
     }
     if (caller == PAIR_AUTH_UID) {
@@ -87,12 +91,13 @@ bool MaySee(store::DeniableItem kind, int id) {
 bool IsManager() {
     RequestContext& context = RequestContext::Current();
     const auto user = store::Users(context.Records()).Find(static_cast<int>(context.Caller()));
-    return user && user->IsManager();
+    return user && user->IsManager() && context.RequestRestrictions().privilege <= store::Privilege::kManager;
 }
 
 std::set<int> DeniedCameras(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
-    std::set<int> denied = context.CamerasDeniedByRequest();
+    std::set<int> denied;
+    context.RequestRestrictions().AddTo(denied, kind);
     if (context.Caller() != PAIR_AUTH_UID) {
         store::Users users(context.Records());
         const int id = static_cast<int>(context.Caller());
@@ -130,6 +135,13 @@ struct PrivProfile::Data {
     int id = 0;
     int privilege = static_cast<int>(store::Privilege::kViewer);
     std::map<int, std::set<int>> denied_cameras;  // by CAM_PRIV_TYPE
+
+    void Restrict(const lookhaven::binding::Restrictions& restrictions) {
+        privilege = std::max(privilege, static_cast<int>(restrictions.privilege));
+        for (const store::CameraAccess kind : store::kEveryAccess) {
+            restrictions.AddTo(denied_cameras[static_cast<int>(kind)], kind);
+        }
+    }
 };
 
 PrivProfile::PrivProfile() : m_pData(std::make_shared<const Data>()) {}
@@ -173,41 +185,31 @@ bool IsDoorPrivAllowed(const PrivProfile& profile, DOOR_PRIV_TYPE, int doorId) {
 }
 
 void PrivProfile::UpdateByJson(const Json::Value& privData) {
-    if (privData.isNull()) {
-        return;
-    }
-    lookhaven::binding::CamerasDeniedBy(privData);  // throws before anything is applied
     auto narrowed = std::make_shared<Data>(*m_pData);
-    narrowed->privilege = std::max(narrowed->privilege, privData.get("privilege", 0).asInt());
-    for (const int camera : lookhaven::binding::CamerasDeniedBy(privData)) {
-        for (const store::CameraAccess kind : store::kEveryAccess) {
-            narrowed->denied_cameras[static_cast<int>(kind)].insert(camera);
-        }
-    }
-    narrowed->denied_cameras[CAM_PRIV_AUDIO].merge(lookhaven::binding::SoundDeniedBy(privData));
+    narrowed->Restrict(lookhaven::binding::RestrictionsOf(privData));
     m_pData = std::move(narrowed);
 }
 
+// Not every handler applies "privData", so the caller's profile comes with it applied.
 PrivProfile PrivProfileGetByUid(unsigned int uid) {
     return OrFailure("PrivProfileGetByUid", PrivProfile(), [&] {
         auto data = std::make_shared<PrivProfile::Data>();
         if (uid == PAIR_AUTH_UID) {
             data->id = static_cast<int>(PAIR_AUTH_UID);
-            return PrivProfile(data);
-        }
-        store::Users users(RequestContext::Current().Records());
-        const auto user = users.Find(static_cast<int>(uid));
-        if (!user) {
-            return PrivProfile();
-        }
-        data->id = user->id;
-        data->privilege = static_cast<int>(user->privilege);
-        for (const store::CameraAccess kind : store::kEveryAccess) {
-            data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
-            if (uid == RequestContext::Current().Caller()) {
-                data->denied_cameras[static_cast<int>(kind)].merge(
-                    std::set(RequestContext::Current().CamerasDeniedByRequest()));
+        } else {
+            store::Users users(RequestContext::Current().Records());
+            const auto user = users.Find(static_cast<int>(uid));
+            if (!user) {
+                return PrivProfile();
             }
+            data->id = user->id;
+            data->privilege = static_cast<int>(user->privilege);
+            for (const store::CameraAccess kind : store::kEveryAccess) {
+                data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
+            }
+        }
+        if (uid == RequestContext::Current().Caller()) {
+            data->Restrict(RequestContext::Current().RequestRestrictions());
         }
         return PrivProfile(data);
     });

@@ -20,6 +20,7 @@
 #include "standalone/control/demand.h"
 #include "standalone/ring/stream.h"
 #include "standalone/store/store.h"
+#include "standalone/store/users.h"
 
 namespace lookhaven::binding {
 
@@ -31,6 +32,19 @@ struct RequestEvents {
     std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
     // The caller has proved to be a paired host. May throw, which ends the request.
     std::function<void()> on_peer = [] {};
+};
+
+// The rights that a request's "privData" leaves to its caller, whoever that is.
+struct Restrictions {
+    std::set<int> cameras;                                  // denied, for every kind of access
+    std::set<int> sound;                                    // of these the sound alone
+    store::Privilege privilege = store::Privilege::kOwner;  // and no more
+
+    bool IsDenied(int camera, store::CameraAccess kind) const {
+        return cameras.contains(camera) || (kind == store::CameraAccess::kAudio && sound.contains(camera));
+    }
+    // Adds what they deny of that kind.
+    void AddTo(std::set<int>& denied, store::CameraAccess kind) const;
 };
 
 class LH_PLATFORM_API RequestContext {
@@ -61,13 +75,9 @@ class LH_PLATFORM_API RequestContext {
     // The handle of the caller's session; empty when there is none.
     const std::string& Session() const { return session_; }
     void SetSession(const std::string& handle) { session_ = handle; }
-    // What the request's "privData" takes away from the caller's rights: cameras, and cameras whose sound alone.
-    const std::set<int>& CamerasDeniedByRequest() const { return cameras_denied_by_request_; }
-    const std::set<int>& SoundDeniedByRequest() const { return sound_denied_by_request_; }
-    void RestrictByPrivData(std::set<int> cameras, std::set<int> sound = {}) {
-        cameras_denied_by_request_ = std::move(cameras);
-        sound_denied_by_request_ = std::move(sound);
-    }
+    // What the request itself takes away from the caller's rights.
+    const Restrictions& RequestRestrictions() const { return restrictions_; }
+    void Restrict(Restrictions restrictions) { restrictions_ = std::move(restrictions); }
 
     // The live stream that the caller has been granted, and whether with its sound.
     const std::optional<control::LiveStream>& GrantedStream() const { return granted_; }
@@ -83,7 +93,9 @@ class LH_PLATFORM_API RequestContext {
     void NotePeer() { events_.on_peer(); }
     // The answer is a picture, alone or in a stream.
     void NotePicture() { wants_picture_ = true; }
-    bool WantsPicture() const { return wants_picture_ || is_stream_; }
+    bool WantsPicture() const { return !is_hidden_ && (wants_picture_ || is_stream_); }
+    // The camera is denied to the caller, who must not be able to tell it from one that does not exist.
+    void NoteHidden() { is_hidden_ = true; }
 
     // The ring entry that was read last and not given back; null when there is none.
     const ring::Entry* HeldEntry() const { return held_entry_; }
@@ -96,12 +108,12 @@ class LH_PLATFORM_API RequestContext {
     std::unique_ptr<store::Store> records_;
     unsigned int caller_ = 0;
     std::string session_;
-    std::set<int> cameras_denied_by_request_;
-    std::set<int> sound_denied_by_request_;
+    Restrictions restrictions_;
     std::optional<control::LiveStream> granted_;
     bool may_hear_ = false;
     bool is_stream_ = false;
     bool wants_picture_ = false;
+    bool is_hidden_ = false;
     const ring::Entry* held_entry_ = nullptr;
 };
 

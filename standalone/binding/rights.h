@@ -11,16 +11,14 @@
 #include <json/json.h>
 
 #include "platform/export.h"
+#include "standalone/binding/request_context.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::binding {
 
-// The cameras denied by the rights that a paired host sends with the request, for every kind of access. Throws
-// Json::Exception for another shape than the one in privilege.cpp.
-LH_PLATFORM_API std::set<int> CamerasDeniedBy(const Json::Value& priv_data);
-
-// Likewise the cameras whose sound alone they deny.
-LH_PLATFORM_API std::set<int> SoundDeniedBy(const Json::Value& priv_data);
+// The rights that a paired host sends with the request. All of them are understood, or Json::Exception is thrown; their
+// shape is in privilege.cpp.
+LH_PLATFORM_API Restrictions RestrictionsOf(const Json::Value& priv_data);
 
 // False for a camera that is denied to the caller or that the request's "privData" denies, and for nobody as the
 // caller. Throws store::StoreError.
@@ -29,7 +27,7 @@ LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
 // False for an item that is denied to the caller, and for nobody as the caller. Throws store::StoreError.
 LH_PLATFORM_API bool MaySee(store::DeniableItem kind, int id);
 
-// Whether the caller is a user who administers the host. Throws store::StoreError.
+// Whether the caller is a user who administers the host, and the request leaves him that. Throws store::StoreError.
 LH_PLATFORM_API bool IsManager();
 
 // The cameras at which MayUse is false for a caller who is somebody. Throws store::StoreError.

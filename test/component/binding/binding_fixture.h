@@ -30,7 +30,7 @@ class Binding : public testing::Test {
         context.CloseRecords();
         context.Begin(home_, nullptr);
         context.SetCaller(user);
-        context.RestrictByPrivData({});
+        context.Restrict({});
     }
 
     const test::TemporaryFolder folder_;

@@ -12,9 +12,10 @@
 #include "platform/emap/device.h"
 #include "platform/emap/emap.h"
 #include "platform/privilege/privprofile.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/binding/rights.h"
 #include "standalone/emap/pictures.h"
 #include "standalone/store/devices.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 #include "test/component/binding/binding_fixture.h"
@@ -65,6 +66,11 @@ TEST_F(EmapBinding, AMapLoadsForThoseWhoMaySeeItWithItsItemsInOrder) {
         EXPECT_EQ(emap.Load(row.emap) == 0, row.loads) << row.caller << " " << row.emap;
         EXPECT_EQ(emap.GetItemNum(), row.loads ? 2 : 0);
     }
+    Call(PAIR_AUTH_UID);
+    RequestContext::Current().Restrict({{1}, {}, {}});
+    Emap narrowed;
+    ASSERT_EQ(narrowed.Load(1), 0);
+    EXPECT_EQ(narrowed.GetItemNum(), 1) << "without the camera that is denied";
     Call(1);
     Emap emap;
     ASSERT_EQ(emap.Load(1), 0);
@@ -117,12 +123,21 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
         int camera = -1, server = -1, there = -1;
         GetPairedCam(own, row.port, camera, server, there);
         EXPECT_EQ(std::vector({camera, server, there}), std::vector({row.camera, row.server, row.there})) << row.port;
+        store::Users(records_).Deny(2, row.camera == 0 ? 9 : row.camera, {store::CameraAccess::kLive});
+        Call(2);
+        GetPairedCam(own, row.port, camera, server, there);
+        EXPECT_EQ(std::vector({camera, server, there}), std::vector({0, 0, 0})) << "one whom it is denied " << row.port;
+        Call(1);
     }
     devices_.Add(
         {.kind = EmapItemType::kPos, .name = "POS terminal", .server_id = 1, .id_on_server = 5, .camera_id = 2});
     POS pos;
     ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 1) << "the camera's id on the till's server";
+    Call(2);
+    ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "nobody learns of a camera that is denied to him";
+    Call(1);
     devices_.Add({.kind = EmapItemType::kPos, .name = "Far till", .server_id = 1, .id_on_server = 6, .camera_id = 1});
     ASSERT_EQ(pos.LoadByIdOnRecServer(6, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "a camera that the till's server does not know";
@@ -156,8 +171,18 @@ TEST_F(EmapBinding, EachProfileIsDeniedItsOwn) {
     EXPECT_THROW(nobody.GetInaEmapIdSet(ITEM_PRIV_VIEW, false), std::runtime_error) << "or nothing would be denied";
     EXPECT_THROW(nobody.GetInaIOIdSet(false), std::runtime_error);
     EXPECT_THROW(nobody.GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), std::runtime_error);
-    RequestContext::Current().RestrictByPrivData({7});
-    EXPECT_THAT(PrivProfileGetByUid(1).GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), ElementsAre(7));
+    const Restrictions restrictions{.cameras = {7}, .sound = {8}, .privilege = store::Privilege::kViewer};
+    for (const unsigned int caller : {1U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
+        Call(caller);
+        EXPECT_EQ(IsManager(), caller == 1);
+        RequestContext::Current().Restrict(restrictions);
+        const PrivProfile restricted = PrivProfileGetByUid(caller);
+        EXPECT_THAT(restricted.GetInaCamIdSet(CAM_PRIV_LIVEVIEW, true), ElementsAre(7)) << caller;
+        EXPECT_THAT(restricted.GetInaCamIdSet(CAM_PRIV_AUDIO, true), ElementsAre(7, 8)) << caller;
+        EXPECT_THAT(DeniedCameras(store::CameraAccess::kAudio), ElementsAre(7, 8)) << caller;
+        EXPECT_EQ(restricted.GetPrivilege(), 2) << caller;
+        EXPECT_FALSE(IsManager()) << caller;
+    }
     const struct {
         unsigned int user;
         int door;
@@ -189,9 +214,11 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     }
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
-    EXPECT_FALSE(SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
+    EXPECT_FALSE(
+        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
-    EXPECT_TRUE(SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+    EXPECT_TRUE(
+        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
 }
 

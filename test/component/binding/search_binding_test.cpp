@@ -38,7 +38,7 @@ TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
                  {"an account that is gone", 77, {}, false}};
     for (const auto& each : cases) {
         Call(each.caller);
-        RequestContext::Current().RestrictByPrivData(each.renounced);
+        RequestContext::Current().Restrict({each.renounced, {}, {}});
         const int refused = each.sees ? 0 : -1;
         EXPECT_EQ(Event().Load(event, 0, 0, 0), refused) << each.who;
         EXPECT_EQ(AlertEvent().Load(alert, 0, 0, 0), refused) << each.who;
