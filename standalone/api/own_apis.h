@@ -2,8 +2,8 @@
 //
 // The APIs of the standalone platform, beside those of the loaded modules: a table each, in a file each.
 //
-// A new API has a row in FindOwnApi, a page in docs/api, and a place in the web server's list of APIs that are no
-// log-in (packaging/nginx).
+// A new API has a row in FindOwnApi, a page in docs/api, and, where it takes a POST, a place in the web server's list
+// of APIs that are no log-in (packaging/nginx).
 #pragma once
 
 #include <span>
@@ -36,6 +36,7 @@ extern const OwnApi kAuthApi;      // log in, log out, who am I
 extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
 extern const OwnApi kEmapApi;      // what an editor of e-maps needs, and the states of doors and ports
 extern const OwnApi kEventApi;     // report what happened at a camera, list it, download its footage
+extern const OwnApi kPairingApi;   // the cameras of this host, for a paired host
 extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends
 extern const OwnApi kPlaybackApi;  // steers a running player of the caller's session
 extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin

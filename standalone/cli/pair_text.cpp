@@ -13,21 +13,22 @@ namespace {
 constexpr std::string_view kPrefix = "lookhaven-pair-1:";
 
 PairOffer Read(const Json::Value& json) {
-    PairOffer offer{json["address"].asString(),
-                    json["port"].asInt(),
-                    json["certificate"].asString(),
-                    json["secret"].asString(),
-                    {}};
-    for (const Json::Value& camera : json["cameras"]) {
-        offer.cameras.push_back({.id_on_server = camera["id"].asInt(),
-                                 .name = camera["name"].asString(),
-                                 .video_type = static_cast<base::Codec>(camera["video"].asInt()),
-                                 .audio = camera["audio"].asBool()});
-    }
-    return offer;
+    return {json["address"].asString(), json["port"].asInt(), json["certificate"].asString(), json["secret"].asString(),
+            CamerasIn(json["cameras"])};
 }
 
 }  // namespace
+
+std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
+    std::vector<store::RemoteCamera> cameras;
+    for (const Json::Value& camera : list) {
+        cameras.push_back({.id_on_server = camera["id"].asInt(),
+                           .name = camera["name"].asString(),
+                           .video_type = static_cast<base::Codec>(camera["video"].asInt()),
+                           .audio = camera["audio"].asBool()});
+    }
+    return cameras;
+}
 
 std::string ToText(const PairOffer& offer) {
     const Json::Value cameras = Array(offer.cameras, [](const store::RemoteCamera& camera) {

@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+#include <json/json.h>
+
 #include "standalone/store/servers.h"
 
 namespace lookhaven::cli {
@@ -17,6 +19,10 @@ struct PairOffer {
     std::string secret;
     std::vector<store::RemoteCamera> cameras;  // server_id is 0
 };
+
+// The cameras of a host as its line and its web API tell them; server_id is 0. Throws Json::Exception for a member of
+// the wrong type.
+std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list);
 
 std::string ToText(const PairOffer& offer);
 

@@ -13,6 +13,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
+#include "standalone/cli/peer_request.h"
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
 #include "standalone/store/secret.h"
@@ -31,6 +32,7 @@ constexpr std::size_t kSecretBytes = 32;
 
 struct Request {
     int id = 0;
+    bool yes = false;
     std::string name;
     std::string address;
     int port = kDefaultPort;
@@ -51,6 +53,8 @@ constexpr Column kColumns[] = {
     {"id", "id"}, {"name", "name"}, {"address", "address", AddressText}, {"port", "port", TextUnlessZero}};
 constexpr Column kCameraColumns[] = {
     {"id", "id"}, {"name", "name"}, {"server", "server"}, {"id on server", "id_on_server"}};
+
+constexpr Column kRefreshColumns[] = {{"id", "id"}, {"name", "name"}, {"new cameras", "new"}};
 
 std::string HostName() {
     char name[256] = "";
@@ -76,7 +80,7 @@ void Pair(const Console& console, const Request& request) {
                           store::RandomHex(kSecretBytes), OwnCameras(store)};
     RecordingServer watcher;
     watcher.name = request.name;
-    watcher.id = RecordingServers(store).Add(watcher, offer.secret);
+    watcher.id = RecordingServers(store).Pair(watcher, offer.secret, {});
     Json::Value data = ToData(watcher);
     data["text"] = ToText(offer);
     console.Answer(data, ToText(offer));
@@ -105,18 +109,9 @@ void Add(const Console& console, const Request& request) {
                            .address = request.address.empty() ? offer.address : request.address,
                            .port = offer.port,
                            .certificate = remote::CertificatesIn(offer.certificate)};
-    server.id = servers.Add(server, offer.secret);
-    try {
-        for (RemoteCamera camera : offer.cameras) {
-            camera.server_id = server.id;
-            servers.PutCamera(camera);
-        }
-    } catch (...) {
-        servers.Remove(server.id);
-        throw;
-    }
-    console.Answer(ToData(server), "The server ", server.name, " has the id ", server.id, " and ", offer.cameras.size(),
-                   " cameras.");
+    server.id = servers.Pair(server, offer.secret, offer.cameras);
+    console.Answer(ToData(server), "Paired with ", server.name, ", the server with id ", server.id, "; it has ",
+                   offer.cameras.size(), " cameras.");
 }
 
 void List(const Console& console) {
@@ -125,11 +120,39 @@ void List(const Console& console) {
     console.Answer(data, Table(kColumns, data));
 }
 
+Json::Value ToData(const store::ServerDenial& denial) {
+    const char* kind = denial.kind == store::EmapItemType::kCamera ? "camera" : "I/O module";
+    return Object("user", denial.user, "kind", kind, "id", denial.id);
+}
+
+// "guest: camera 4, I/O module 2; ann: camera 4"
+std::string DenialsText(const Json::Value& denials) {
+    std::string text;
+    std::string user;
+    for (const Json::Value& denial : denials) {
+        const bool is_next = denial["user"] == user;
+        user = denial["user"].asString();
+        text += (text.empty() ? ""
+                 : is_next    ? ", "
+                              : "; ") +
+                (is_next ? "" : user + ": ") + denial["kind"].asString() + " " + PlainText(denial["id"]);
+    }
+    return text;
+}
+
+// A new pairing gives the cameras other ids, so what was denied would be allowed by it.
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
+    const Json::Value denials = Array(servers.Denials(request.id), [](const auto& denial) { return ToData(denial); });
+    const std::string text = DenialsText(denials);
+    if (!denials.empty() && !request.yes) {
+        throw Failure(kDataError, "what users are denied of this server goes with it (", text,
+                      "): repeat this with --yes");
+    }
     servers.Remove(request.id);
-    console.Answer(Object("id", request.id), "The server ", request.id, " was removed, and its cameras with it.");
+    console.Answer(Object("id", request.id, "denials", denials), "Removed server ", request.id, " with its cameras",
+                   denials.empty() ? "" : ", and what users were denied of it: ", text, ".");
 }
 
 void ListCameras(const Console& console) {
@@ -141,22 +164,60 @@ void ListCameras(const Console& console) {
     console.Answer(data, Table(kCameraColumns, data));
 }
 
+// Returns how many cameras are new here.
+int RefreshCameras(RecordingServers& servers, const RecordingServer& server) {
+    const std::string answer =
+        AskPeer(server, servers.FindSecret(server.id), "api=VEXO.Pairing&version=1&method=Cameras");
+    const Json::Value json = ParseJson(answer);
+    if (!json.isObject() || !json["data"].isObject() || !json["data"]["camera"].isArray()) {
+        throw Failure(kDataError, "an answer that cannot be understood");
+    }
+    return servers.PutCameras(server.id, CamerasIn(json["data"]["camera"]));
+}
+
+// One server that fails does not keep the others from being asked.
+void Refresh(const Console& console) {
+    store::Store store = console.OpenStore();
+    RecordingServers servers(store);
+    Json::Value data = Json::arrayValue;
+    std::string failures;
+    for (const RecordingServer& server : servers.List()) {
+        if (!server.enabled || server.address.empty()) {
+            continue;
+        }
+        try {
+            data.append(Object("id", server.id, "name", server.name, "new", RefreshCameras(servers, server)));
+        } catch (const std::exception& failure) {
+            failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure.what());
+        }
+    }
+    if (!failures.empty()) {
+        throw Failure(kUnavailable, failures);
+    }
+    console.Answer(data, Table(kRefreshColumns, data));
+}
+
 }  // namespace
 
 void AddServer(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console, "server", "Hosts that show each other's cameras");
     Request& request = group.request();
     const std::string name = "The other host's name here";
-    group.Add("pair", "Lets another host show this one's cameras: prints a line to enter there", Pair)
+    group.Add("pair", "Lets another host show this one's cameras, or renews that: prints a line to enter there", Pair)
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "This host's address for the other one (default: its host name)")
         .Option("--port", request.port, "This host's HTTPS port (default: 8443)");
-    group.Add("add", "Reads the line of a host whose cameras are to be shown from standard input", Add)
+    group
+        .Add("add", "Reads the line of a host whose cameras are to be shown from standard input, also of a known host",
+             Add)
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "The other host's address (default: as in the line)");
     group.Add("list", "Lists the hosts", List);
     group.Add("cameras", "Lists the cameras of other hosts with their ids here", ListCameras);
-    group.Add("remove", "Ends a pairing", Remove).Option("id", request.id, "The host's id", Required);
+    group.Add("refresh", "Asks the hosts for cameras that were added there", Refresh);
+    group.Add("remove", "Ends a pairing", Remove)
+        .Option("id", request.id, "The host's id", Required)
+        .Flag("--yes", request.yes, "Also where users are denied some of its cameras or devices");
 }
 
 }  // namespace lookhaven::cli

@@ -32,12 +32,18 @@ struct Mapping<RemoteCamera> {
     }
 };
 
+template <>
+struct Mapping<ServerDenial> {
+    static auto Members(auto& denial) { return std::tie(denial.user, denial.kind, denial.id); }
+};
+
 namespace {
 
 constexpr std::size_t kMaxCameraNameBytes = 255;
 constexpr std::size_t kMaxAddressBytes = 253;
 constexpr std::size_t kMaxCertificateBytes = 16'384;
 constexpr std::size_t kSecretDigits = 64;
+constexpr int kMaxCameras = 1000;  // of a server: what it says of itself must not fill the store
 
 // Letters, digits, ".", "-" and, of IPv6, ":": the address becomes a part of the web server's configuration.
 bool IsAddress(std::string_view address) {
@@ -91,17 +97,79 @@ void RequireValid(const RemoteCamera& camera) {
     }
 }
 
+struct PutCounts {
+    int added = 0;
+    int changed = 0;
+};
+
+// Returns the camera's id here.
+int PutRow(soci::session& sql, RemoteCamera camera, PutCounts& counts) {
+    const auto known = FetchOne<RemoteCamera>(sql, kOnServer, camera.server_id, camera.id_on_server);
+    camera.id = known ? known->id : NextId(sql, "camera");
+    if (!known) {
+        Insert(sql, camera);
+        ++counts.added;
+    } else if (known != camera) {
+        store::Update(sql, camera);
+        ++counts.changed;
+    }
+    return camera.id;
+}
+
+PutCounts PutRows(soci::session& sql, int server_id, const std::vector<RemoteCamera>& cameras) {
+    PutCounts counts;
+    for (RemoteCamera camera : cameras) {
+        RequireValid(camera);
+        camera.server_id = server_id;
+        PutRow(sql, camera, counts);
+    }
+    if (FetchOne<int>(sql, "select count(*) from remote_cameras where server_id = :id", server_id) > kMaxCameras) {
+        throw InvalidRecord("a server has 1000 cameras at most");
+    }
+    return counts;
+}
+
+int AddRow(soci::session& sql, RecordingServer server, const std::string& secret) {
+    server.id = NextId(sql, "server");
+    RequireValid(sql, server);
+    Insert(sql, ServerRow(server, secret));
+    return server.id;
+}
+
+void UpdateRow(soci::session& sql, const RecordingServer& server, const std::optional<std::string>& secret) {
+    RequireServer(sql, server.id);
+    RequireValid(sql, server);
+    store::Update(sql, server);
+    if (secret) {
+        Execute(sql, "update servers set secret = :secret where id = :id", *secret, server.id);
+    }
+}
+
 }  // namespace
 
 int RecordingServers::Add(const RecordingServer& server, const std::string& secret) {
     RequireSecret(secret);
     return connection_.Write([&](soci::session& sql) {
-        RecordingServer added = server;
-        added.id = NextId(sql, "server");
-        RequireValid(sql, added);
-        Insert(sql, ServerRow(added, secret));
         RaiseRevision(sql);
-        return added.id;
+        return AddRow(sql, server, secret);
+    });
+}
+
+int RecordingServers::Pair(const RecordingServer& server, const std::string& secret,
+                           const std::vector<RemoteCamera>& cameras) {
+    RequireSecret(secret);
+    return connection_.Write([&](soci::session& sql) {
+        RaiseRevision(sql);
+        const auto known = FetchOne<RecordingServer>(sql, "where name = :name", server.name);
+        RecordingServer paired = server;
+        if (known && known->address.empty() == server.address.empty()) {
+            paired.id = known->id;
+            UpdateRow(sql, paired, secret);
+        } else {
+            paired.id = AddRow(sql, server, secret);
+        }
+        PutRows(sql, paired.id, cameras);
+        return paired.id;
     });
 }
 
@@ -111,12 +179,7 @@ void RecordingServers::Update(const RecordingServer& server, const std::optional
     }
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireServer(sql, server.id);
-        RequireValid(sql, server);
-        store::Update(sql, server);
-        if (secret) {
-            Execute(sql, "update servers set secret = :secret where id = :id", *secret, server.id);
-        }
+        UpdateRow(sql, server, secret);
     });
 }
 
@@ -124,12 +187,29 @@ void RecordingServers::Remove(int id) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
         RequireServer(sql, id);
+        for (const char* table : {"camera_ports", "denied_cameras"}) {
+            Execute(sql,
+                    std::string("delete from ") + table +
+                        " where camera_id in (select id from remote_cameras where server_id = :id)",
+                    id);
+        }
         Execute(sql,
-                "delete from camera_ports where camera_id in (select id from remote_cameras where server_id = :id)",
+                "delete from denied_items where exists (select 1 from devices"
+                " where devices.kind = denied_items.kind and devices.id = item_id and server_id = :id)",
                 id);
         Execute(sql, "delete from devices where server_id = :id", id);
         Execute(sql, "delete from servers where id = :id", id);
     });
+}
+
+std::vector<ServerDenial> RecordingServers::Denials(int id) {
+    return connection_.FetchAll<ServerDenial>(
+        "select users.name, 0, camera_id from denied_cameras join users on users.id = user_id"
+        " join remote_cameras on remote_cameras.id = camera_id where server_id = :cameras_of"
+        " union select users.name, denied_items.kind, item_id from denied_items join users on users.id = user_id"
+        " join devices on devices.kind = denied_items.kind and devices.id = item_id where server_id = :devices_of"
+        " order by 1, 2, 3",
+        id, id);
 }
 
 std::optional<RecordingServer> RecordingServers::Find(int id) {
@@ -155,11 +235,19 @@ int RecordingServers::PutCamera(const RemoteCamera& camera) {
     return connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
         RequireServer(sql, camera.server_id);
-        const auto known = FetchOne<RemoteCamera>(sql, kOnServer, camera.server_id, camera.id_on_server);
-        RemoteCamera put = camera;
-        put.id = known ? known->id : NextId(sql, "camera");
-        known ? store::Update(sql, put) : Insert(sql, put);
-        return put.id;
+        PutCounts ignored;
+        return PutRow(sql, camera, ignored);
+    });
+}
+
+int RecordingServers::PutCameras(int server_id, const std::vector<RemoteCamera>& cameras) {
+    return connection_.Write([&](soci::session& sql) {
+        RequireServer(sql, server_id);
+        const PutCounts counts = PutRows(sql, server_id, cameras);
+        if (counts.added + counts.changed > 0) {
+            RaiseRevision(sql);
+        }
+        return counts.added;
     });
 }
 

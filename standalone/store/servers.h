@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "standalone/store/cameras.h"
+#include "standalone/store/emaps.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::store {
@@ -29,6 +30,15 @@ struct RemoteCamera {
     std::string name = {};  // UTF-8, 1 to 255 bytes
     base::Codec video_type = base::Codec::kMjpeg;
     bool audio = false;
+
+    friend bool operator==(const RemoteCamera&, const RemoteCamera&) = default;
+};
+
+// A right that a user lacks at a camera or device of a recording server.
+struct ServerDenial {
+    std::string user;
+    EmapItemType kind = EmapItemType::kCamera;  // a camera or an I/O module
+    int id = 0;                                 // on this host
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
@@ -43,8 +53,15 @@ class RecordingServers {
     int Add(const RecordingServer& server, const std::string& secret);
     // Replaces the record of server.id, the secret when one is given. Throws as Add, and NotFound.
     void Update(const RecordingServer& server, const std::optional<std::string>& secret = {});
-    // Removes the server with its cameras and devices; their ids are not used again. Throws NotFound.
+    // Adds the server with its cameras, or updates the one of that name: a camera keeps its id here, and thereby who
+    // is denied it, and one that is not among the cameras any more stays. Returns the id. Throws as Add; AlreadyExists
+    // where the name is that of a peer which connects to this host, and the other way round.
+    int Pair(const RecordingServer& server, const std::string& secret, const std::vector<RemoteCamera>& cameras);
+    // Removes the server with its cameras and devices, and Denials(id) with them; their ids are not used again. Throws
+    // NotFound.
     void Remove(int id);
+    // What users are denied of the server, by user.
+    std::vector<ServerDenial> Denials(int id);
 
     std::optional<RecordingServer> Find(int id);
     std::vector<RecordingServer> List();  // by id
@@ -58,6 +75,9 @@ class RecordingServers {
     // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
     // Returns the id. Throws InvalidRecord, or NotFound for an unknown server.
     int PutCamera(const RemoteCamera& camera);
+    // The same for all cameras that the server has now, in one transaction; their server_id is ignored. Nothing is
+    // written, and no revision raised, when all are known so. Returns how many are new here.
+    int PutCameras(int server_id, const std::vector<RemoteCamera>& cameras);
     // Throws NotFound.
     void RemoveCamera(int id);
     std::optional<RemoteCamera> FindCamera(int id);

@@ -4,6 +4,7 @@
 #include <fstream>
 
 #include "standalone/store/devices.h"
+#include "standalone/store/servers.h"
 #include "test/component/cli/program.h"
 
 namespace lookhaven::cli {
@@ -73,6 +74,23 @@ TEST_F(EmapsTest, DevicesAreKnownReportedAndDenied) {
           {"door remove 3", 66, "no door 3"}});
     store::Store store = Open();
     EXPECT_TRUE(store::Devices(store).Find(store::EmapItemType::kIoModule, 2)->ports.contains(5));
+}
+
+TEST_F(EmapsTest, AHostIsNotRemovedWithItsDenialsUnseen) {
+    store::Store store = Open();
+    store::RecordingServers servers(store);
+    store::RecordingServer annex{.name = "Annex", .address = "127.0.0.1", .port = 1};
+    annex.certificate = "-----BEGIN CERTIFICATE-----\n-----END CERTIFICATE-----\n";
+    servers.Pair(annex, std::string(64, 'a'), {{.id_on_server = 1, .name = "Yard"}});
+    const std::string camera = std::to_string(servers.FindCamera(1, 1)->id);
+    Play({{"server refresh", 69, "Annex failed: no connection"},
+          {"io add Shed --server 1 --id-on-server 4", 0, "id 2"},
+          {"user deny viewer " + camera, 0, "denied"},
+          {"user deny viewer --io 2", 0, "denied"},
+          {"server remove 1", 65, "viewer: camera " + camera + ", I/O module 2"},
+          {"user list", 0, camera},
+          {"server remove 1 --yes", 0, "denied of it: viewer: camera " + camera + ", I/O module 2"},
+          {"server list --json", 0, "[]"}});
 }
 
 TEST_F(EmapsTest, AnotherHostIsTakenInByItsLineAlone) {

@@ -6,6 +6,7 @@
 #include "standalone/store/devices.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
+#include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
 namespace lookhaven::store {
@@ -204,6 +205,45 @@ TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     EXPECT_EQ(servers_.PutCamera({.server_id = server, .id_on_server = 5, .name = "New"}), id);
     EXPECT_EQ(servers_.FindCamera(server, 5)->name, "New");
     EXPECT_THROW(servers_.PutCamera({.server_id = 99, .id_on_server = 5, .name = "New"}), NotFound);
+}
+
+TEST_P(EmapTest, WhatIsDeniedOfAServerOutlivesANewPairingAndNoRemovalUnseen) {
+    Users users(store_);
+    const int bob = users.Add("bob", "long enough", Privilege::kViewer).id;
+    RecordingServer annex{.name = "Annex", .address = "192.0.2.7", .port = 8443, .certificate = kCertificate};
+    const int server = servers_.Pair(annex, kSecret, {{.id_on_server = 7, .name = "Yard"}});
+    const int yard = servers_.FindCamera(server, 7)->id;
+    const int box =
+        devices_.Add({.kind = EmapItemType::kIoModule, .name = "D", .server_id = server, .id_on_server = 1});
+    devices_.Add({.kind = EmapItemType::kIoModule, .name = "Own"});
+    users.Deny(bob, yard);
+    users.DenyItem(bob, DeniableItem::kIoModule, box);
+    users.DenyItem(bob, DeniableItem::kIoModule, box + 1);
+    annex.address = "198.51.100.9";
+    EXPECT_EQ(servers_.Pair(annex, std::string(64, 'b'), {{.id_on_server = 7, .name = "Back yard"}}), server);
+    EXPECT_EQ(servers_.FindCamera(server, 7)->id, yard);
+    EXPECT_EQ(servers_.Find(server)->address + servers_.FindSecret(server), "198.51.100.9" + std::string(64, 'b'));
+    EXPECT_THROW(servers_.Pair({.name = "Annex"}, kSecret, {}), AlreadyExists) << "that one is not asked, it asks";
+
+    const std::int64_t before = Settings(store_).Revision();
+    EXPECT_EQ(servers_.PutCameras(server, {{.id_on_server = 7, .name = "Back yard"}}), 0);
+    EXPECT_EQ(Settings(store_).Revision(), before) << "every minute nothing new";
+    EXPECT_EQ(servers_.PutCameras(server, {{.id_on_server = 7, .name = "Yard"}, {.id_on_server = 8, .name = "Dock"}}),
+              1);
+    EXPECT_EQ(servers_.FindCamera(server, 7)->id, yard);
+    std::vector<RemoteCamera> flood(1001, {.name = "x"});
+    std::ranges::for_each(flood, [id = 1](RemoteCamera& camera) mutable { camera.id_on_server = id++; });
+    EXPECT_THROW(servers_.PutCameras(server, flood), InvalidRecord);
+    EXPECT_THAT(servers_.ListCameras(), SizeIs(2));
+
+    std::string denials;
+    for (const ServerDenial& denial : servers_.Denials(server)) {
+        denials += denial.user + std::to_string(static_cast<int>(denial.kind)) + std::to_string(denial.id) + ' ';
+    }
+    EXPECT_EQ(denials, "bob0" + std::to_string(yard) + " bob3" + std::to_string(box) + " ");
+    servers_.Remove(server);
+    EXPECT_EQ(Ask("select count(*) from denied_cameras"), "0");
+    EXPECT_THAT(users.DeniedItems(bob, DeniableItem::kIoModule), ElementsAre(box + 1));
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(EmapTest);
