@@ -11,14 +11,18 @@
 #include "standalone/api/download.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
+#include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/settings.h"
+#include "standalone/store/users.h"
 
 namespace lookhaven::api {
 
 namespace {
 
-constexpr std::int64_t kMaxAheadSeconds = 3600;  // a POS terminal's clock may be off
+constexpr std::int64_t kMaxAheadSeconds = 300;  // a POS terminal's clock may be off
+constexpr std::int64_t kSecondsPerDay = 86'400;
 constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
 constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
@@ -69,6 +73,7 @@ Json::Value Describe(const store::Mark& mark) {
     json["start"] = Json::Int64{mark.start_s};
     json["stop"] = Json::Int64{mark.end_s};
     json["state"] = NameOf(mark.state);
+    json["reported_by"] = mark.reporter.name;
     json["text"] = LinesOf(mark.text);
     return json;
 }
@@ -102,6 +107,31 @@ std::string Get(const Call& call) {
                 : AnswerVisible(store::Events(call.Records()).Find(id));
 }
 
+// The caller, who may report and has not yet reported too much.
+store::Reporter RequireReporter(const Call& call, std::int64_t now_s) {
+    const auto user = store::Users(call.Records()).Find(static_cast<int>(call.context.Caller()));
+    if (!user || (!user->may_mark_as_viewer && !binding::IsManager())) {
+        throw Failure(403, "this account may not report events");
+    }
+    if (store::Marks(call.Records()).CountReportedBy(user->id, now_s - kSecondsPerDay) >=
+        store::Settings(call.Records()).NumberOr("marks_per_day", store::kMarksPerDay)) {
+        throw Failure(429, "this account has reported as many events as it may within 24 hours");
+    }
+    return {user->id, user->name};
+}
+
+// What is reported is evidence: of a time of which there may be footage.
+void RequirePlausible(const Call& call, int camera, std::int64_t start_s, std::int64_t now_s) {
+    if (start_s > now_s + kMaxAheadSeconds) {
+        throw Failure(400, "start lies in the future");
+    }
+    const std::vector<store::Event> first = store::Events(call.Records()).List({.camera_ids = {camera}, .limit = 1});
+    const std::int64_t earliest_s = first.empty() ? now_s : first.front().start_s;
+    if (start_s < std::min(earliest_s, now_s - kMaxAheadSeconds)) {
+        throw Failure(400, "start lies before the first footage of the camera");
+    }
+}
+
 std::string MarkIt(const Call& call) {
     const auto kind = KindOf(call);
     if (!kind) {
@@ -111,19 +141,17 @@ std::string MarkIt(const Call& call) {
     const std::int64_t now_s = base::WallMillis() / 1000;
     const std::int64_t start_s = call.NumberOr("start", now_s);
     const std::int64_t length_s = call.NumberOr("length", 0);
-    if (camera < 1 || start_s < 1 || start_s > now_s + kMaxAheadSeconds || length_s < 0 ||
-        length_s > store::kMaxMarkSeconds) {
+    if (camera < 1 || start_s < 1 || length_s < 0 || length_s > store::kMaxMarkSeconds) {
         throw Failure(400, "camera, start or length is out of its bounds");
     }
-    if (!binding::MayUse(camera, store::CameraAccess::kPlayback)) {
-        throw Failure(403, "you may not see this camera");
+    const store::Reporter reporter = RequireReporter(call, now_s);
+    if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
+        throw Failure(404, kNoSuchCamera);
     }
-    try {
-        return SuccessAnswer(Describe(
-            store::Marks(call.Records()).Add(*kind, camera, start_s, length_s, TextOf(call.Parameter("text")))));
-    } catch (const store::NotFound&) {
-        throw Failure(404, "there is no such camera");
-    }
+    RequirePlausible(call, camera, start_s, now_s);
+    return SuccessAnswer(
+        Describe(store::Marks(call.Records())
+                     .Add(*kind, camera, start_s, length_s, TextOf(call.Parameter("text")), reporter, now_s)));
 }
 
 // The cameras asked for, or all, without those that the caller may not play back.

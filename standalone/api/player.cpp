@@ -30,9 +30,7 @@ bool IsPlayer(const Call& call) {
 }
 
 int PlayersPerSession(store::Store& records) {
-    const std::string text = store::Settings(records).Find("players_per_session").value_or("1");
-    const Json::Value number = binding::JsonFromText("", text);
-    return number.isInt() ? std::clamp(number.asInt(), 1, kMaxSideBySide) : 1;
+    return std::clamp(store::Settings(records).NumberOr("players_per_session", 1), 1, kMaxSideBySide);
 }
 
 void PreparePlayer(const Call& call) {

@@ -166,7 +166,8 @@ void AddMark(const Console& console, const Request& request) {
         text += (text.empty() ? "" : "\n") + line;
     }
     store::Store store = console.OpenStore();
-    const Mark mark = Marks(store).Add(request.mark_kind, request.camera, moment, ParseDuration(request.length), text);
+    const Mark mark = Marks(store).Add(request.mark_kind, request.camera, moment, ParseDuration(request.length), text,
+                                       {}, NowSeconds());
     console.Answer(ToData(mark), "Added ", mark.kind == MarkKind::kAlert ? "alert" : "POS transaction", " with id ",
                    mark.id, "; its footage from ", FormatMoment(mark.start_s), " to ", FormatMoment(mark.end_s),
                    " is saved once it is recorded.");

@@ -40,6 +40,13 @@ std::string FirstLine(const Json::Value& text) {
     return all.substr(0, all.find('\n'));
 }
 
+// Nothing for a mark of the command line.
+std::string ReporterText(const store::Mark& mark) {
+    return mark.reporter.name.empty()
+               ? ""
+               : Concat("by     ", mark.reporter.name, ", ", FormatMoment(mark.reported_s), "\n");
+}
+
 constexpr Column kEventColumns[] = {{"id", "id"},
                                     {"camera", "camera_id"},
                                     {"start", "start", MomentText},
@@ -48,11 +55,8 @@ constexpr Column kEventColumns[] = {{"id", "id"},
                                     {"video", "video_type", VideoTypeText},
                                     {"audio", "audio_codec"},
                                     {"", "", StateText}};
-constexpr Column kMarkColumns[] = {{"id", "id"},
-                                   {"camera", "camera_id"},
-                                   {"moment", "moment", MomentText},
-                                   {"state", "state"},
-                                   {"text", "text", FirstLine}};
+constexpr Column kMarkColumns[] = {{"id", "id"},       {"camera", "camera_id"},        {"moment", "moment", MomentText},
+                                   {"state", "state"}, {"reported by", "reported_by"}, {"text", "text", FirstLine}};
 
 }  // namespace
 
@@ -67,7 +71,8 @@ Json::Value ToData(const store::Event& event) {
 Json::Value ToData(const store::Mark& mark) {
     return Object("kind", mark.kind == store::MarkKind::kAlert ? "alert" : "pos", "id", mark.id, "camera_id",
                   mark.camera_id, "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text", mark.text,
-                  "state", NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo);
+                  "state", NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo,
+                  "reported_by", mark.reporter.name, "reported", mark.reported_s);
 }
 
 std::string EventTable(const Json::Value& events) {
@@ -94,7 +99,7 @@ std::string Description(const store::Mark& mark) {
     return Concat(mark.kind == store::MarkKind::kAlert ? "Alert " : "POS transaction ", mark.id, " of camera ",
                   mark.camera_id, ", ", NameOf(mark.state), mark.demo ? ", generated" : "", "\nat     ",
                   FormatMoment(mark.moment_s), "\nfrom   ", FormatMoment(mark.start_s), "\nto     ",
-                  FormatMoment(mark.end_s), "\n", mark.text, mark.text.empty() ? "" : "\n");
+                  FormatMoment(mark.end_s), "\n", ReporterText(mark), mark.text, mark.text.empty() ? "" : "\n");
 }
 
 }  // namespace lookhaven::cli

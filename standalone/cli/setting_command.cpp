@@ -6,6 +6,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
+#include "standalone/store/marks.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::cli {
@@ -22,7 +23,9 @@ struct Setting {
 
 constexpr Setting kSettings[] = {
     {"login_port", 8080, 1, 65535, "the port that clients are given for a direct log-in"},
-    {"players_per_session", 1, 1, 16, "recorded events that one session may play side by side"}};
+    {"players_per_session", 1, 1, 16, "recorded events that one session may play side by side"},
+    {"marks_per_day", store::kMarksPerDay, 1, 1'000'000,
+     "alerts and POS transactions that one account may report within 24 hours"}};
 
 constexpr Column kColumns[] = {{"setting", "setting"}, {"value", "value"}, {"meaning", "meaning"}};
 

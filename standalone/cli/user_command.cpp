@@ -46,6 +46,7 @@ struct Request {
     std::optional<int> group;
     std::map<DeniableItem, std::optional<int>> items;
     std::vector<CameraAccess> kinds;
+    bool marks = false;
 };
 
 std::string PrivilegeName(const Json::Value& privilege) {
@@ -57,7 +58,8 @@ User RequireUser(Users& users, const std::string& name) {
 }
 
 Json::Value ToData(const User& user) {
-    return Object("id", user.id, "name", user.name, "privilege", static_cast<int>(user.privilege));
+    return Object("id", user.id, "name", user.name, "privilege", static_cast<int>(user.privilege), "may_mark",
+                  user.MayMark());
 }
 
 Json::Value Ids(const std::set<int>& ids) {
@@ -88,9 +90,14 @@ std::string DeniedItemsText(const Json::Value& user) {
     return text;
 }
 
+std::string YesText(const Json::Value& truth) {
+    return truth.asBool() ? "yes" : "";
+}
+
 constexpr Column kColumns[] = {{"id", "id"},
                                {"name", "name"},
                                {"privilege", "privilege", PrivilegeName},
+                               {"marks", "may_mark", YesText},
                                {"denied cameras", "denied", DeniedAccessText},
                                {"denied groups", "denied_groups", DeniedAccessText},
                                {"other denied items", "", DeniedItemsText}};
@@ -175,14 +182,23 @@ const ItemKind* NamedItem(const Request& request) {
     return kind == std::end(kItems) ? nullptr : kind;
 }
 
+void PermitMarks(Users& users, const User& user, bool allow) {
+    if (!allow && user.IsManager()) {
+        throw Failure(kDataError, user.name, " is ", PrivilegeName(static_cast<int>(user.privilege)),
+                      ", and may report alerts and POS transactions as such");
+    }
+    allow ? users.AllowMarks(user.id) : users.DenyMarks(user.id);
+}
+
 void Permit(const Console& console, const Request& request, bool allow) {
     const auto item_count =
         std::ranges::count_if(request.items, [](const auto& item) { return item.second.has_value(); });
-    if ((request.camera ? 1 : 0) + (request.group ? 1 : 0) + item_count != 1) {
-        throw Failure(kUsage, "name one camera, group, e-map, door or I/O module: see lookhaven user deny --help");
+    if ((request.camera ? 1 : 0) + (request.group ? 1 : 0) + (request.marks ? 1 : 0) + item_count != 1) {
+        throw Failure(kUsage, "name one camera, group, e-map, door or I/O module, or --mark: see lookhaven user deny"
+                              " --help");
     }
     const ItemKind* item = NamedItem(request);
-    if (item != nullptr && !request.kinds.empty()) {
+    if ((item != nullptr || request.marks) && !request.kinds.empty()) {
         throw Failure(kUsage, "only access to cameras and groups has a kind: leave out --kind");
     }
     store::Store store = console.OpenStore();
@@ -190,7 +206,10 @@ void Permit(const Console& console, const Request& request, bool allow) {
     const User user = RequireUser(users, request.name);
     std::string subject = request.camera ? Concat("camera ", *request.camera) : "";
     std::string end = ".";
-    if (item != nullptr) {
+    if (request.marks) {
+        subject = "reporting of alerts and POS transactions";
+        PermitMarks(users, user, allow);
+    } else if (item != nullptr) {
         const int id = *request.items.at(item->kind);
         subject = Concat(item->name, " ", id);
         allow ? users.AllowItem(user.id, item->kind, id) : users.DenyItem(user.id, item->kind, id);
@@ -198,7 +217,8 @@ void Permit(const Console& console, const Request& request, bool allow) {
         subject = request.group ? Concat("group ", *request.group) : subject;
         end = PermitAccess(store, user.id, request, allow);
     }
-    console.Answer(ToData(user), "The ", subject, allow ? " is allowed to " : " is denied to ", user.name, end);
+    console.Answer(ToData(RequireUser(users, user.name)), "The ", subject, allow ? " is allowed to " : " is denied to ",
+                   user.name, end);
 }
 
 void Deny(const Console& console, const Request& request) {
@@ -231,6 +251,7 @@ void AddUser(CLI::App& program, const Console& console) {
             command.Option(item.option, request.items[item.kind],
                            std::string("Instead of a camera, this ") + item.name);
         }
+        command.Flag("--mark", request.marks, "Instead of a camera, reporting alerts and POS transactions");
         command.Option("--kind", request.kinds, "The kind of access; may be repeated (default: all)", OneOf(kAccess),
                        Repeatable);
     }

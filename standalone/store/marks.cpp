@@ -15,10 +15,12 @@ template <>
 struct Mapping<Mark> {
     static constexpr const char* kTable = "marks";
     static constexpr const char* kColumns =
-        "id, kind, camera_id, moment_s, start_s, end_s, text, state, mount_id, path, demo";
+        "id, kind, camera_id, moment_s, start_s, end_s, text, state, mount_id, path, demo, reporter_id, reporter,"
+        " reported_s";
     static auto Members(auto& mark) {
         return std::tie(mark.id, mark.kind, mark.camera_id, mark.moment_s, mark.start_s, mark.end_s, mark.text,
-                        mark.state, mark.mount_id, mark.path, mark.demo);
+                        mark.state, mark.mount_id, mark.path, mark.demo, mark.reporter.user_id, mark.reporter.name,
+                        mark.reported_s);
     }
 };
 
@@ -67,7 +69,8 @@ std::vector<Mark> OfCamera(soci::session& sql, const MarkFilter& filter, int cam
 
 }  // namespace
 
-Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text) {
+Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
+                const Reporter& reporter, std::int64_t now_s) {
     if (moment_s < 0 || moment_s > kLastMoment || length_s < 0 || length_s > kMaxMarkSeconds) {
         throw InvalidRecord("a mark is of a moment since 1970 and lasts 0 to 3600 seconds");
     }
@@ -83,6 +86,8 @@ Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_
         mark.camera_id = camera_id;
         mark.moment_s = moment_s;
         mark.text = text;
+        mark.reporter = reporter;
+        mark.reported_s = now_s;
         mark.start_s = std::max<std::int64_t>(moment_s - plan.pre_s, 0);
         mark.end_s = moment_s + length_s + plan.post_s;
         RequireMark(mark);
@@ -90,6 +95,14 @@ Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_
         Insert(sql, mark);
         return mark;
     });
+}
+
+int Marks::CountReportedBy(int user_id, std::int64_t since_s) {
+    return connection_
+        .FetchOne<int>("select count(*) from marks where reporter_id = :user and reporter_id <> 0"
+                       " and reported_s >= :since",
+                       user_id, since_s)
+        .value();
 }
 
 void Marks::AddAll(const std::vector<Mark>& marks) {

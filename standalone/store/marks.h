@@ -29,6 +29,15 @@ enum class MarkState : int {
 
 constexpr std::int64_t kMaxMarkSeconds = 3600;
 constexpr std::size_t kMaxMarkTextBytes = 8192;
+constexpr int kMarksPerDay = 5000;  // of an account, unless the setting marks_per_day says otherwise
+
+// Whose word a mark is: an account of the web API, or the command line, which has no number.
+struct Reporter {
+    int user_id = 0;
+    std::string name;
+
+    friend bool operator==(const Reporter&, const Reporter&) = default;
+};
 
 struct Mark {
     int id = 0;
@@ -42,6 +51,8 @@ struct Mark {
     int mount_id = 0;  // these two once it is saved
     std::string path;  // of the span file, relative to the mount
     bool demo = false;
+    Reporter reporter;            // named as the account was called then
+    std::int64_t reported_s = 0;  // 0: not known
 
     friend bool operator==(const Mark&, const Mark&) = default;
 };
@@ -64,8 +75,11 @@ class Marks {
 
     // Stores a pending mark and returns it with its id and with the span that the camera's recording plan asks for.
     // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
-    // characters but line ends. Throws InvalidRecord, or NotFound for an unknown camera.
-    Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text);
+    // characters but line ends. now_s: when it was reported. Throws InvalidRecord, or NotFound for an unknown camera.
+    Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
+             const Reporter& reporter = {}, std::int64_t now_s = 0);
+    // How many of the marks that there are the account has reported since then.
+    int CountReportedBy(int user_id, std::int64_t since_s);
     // Stores rows as they are but under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(const std::vector<Mark>& marks);
 

@@ -111,10 +111,20 @@ constexpr const char* kEmaps[] = {
     " kind integer not null, item_id integer not null, primary key (user_id, kind, item_id))",
 };
 
+// Who reported a mark, and when: by number, since names are given again, and by the name of that day.
+constexpr const char* kReporters[] = {
+    "alter table users add column may_mark integer not null default 0",
+    "alter table marks add column reporter_id integer not null default 0",
+    "alter table marks add column reporter text not null default ''",
+    "alter table marks add column reported_s bigint not null default 0",
+    "create index marks_by_reporter on marks (reporter_id, reported_s) where reporter_id <> 0",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
     {"e-maps, their devices, recording servers", kEmaps},
+    {"who reported a mark, and who may", kReporters},
 };
 
 }  // namespace

@@ -13,10 +13,10 @@ namespace lookhaven::store {
 template <>
 struct Mapping<Session> {
     static constexpr const char* kTable = "sessions join users on users.id = user_id";
-    static constexpr const char* kColumns = "handle, created, last_seen, expires, users.id, name, privilege";
+    static constexpr const char* kColumns = "handle, created, last_seen, expires, users.id, name, privilege, may_mark";
     static auto Members(auto& session) {
         return std::tie(session.handle, session.created_s, session.last_seen_s, session.expires_s, session.user.id,
-                        session.user.name, session.user.privilege);
+                        session.user.name, session.user.privilege, session.user.may_mark_as_viewer);
     }
 };
 

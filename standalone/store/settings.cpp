@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/settings.h"
 
+#include <charconv>
+
 #include "standalone/store/connection.h"
 #include "standalone/store/text.h"
 
@@ -18,6 +20,13 @@ std::optional<std::string> Settings::Find(std::string_view key) {
         return std::nullopt;
     }
     return connection_.FetchOne<std::string>("select value from settings where name = :name", std::string(key));
+}
+
+int Settings::NumberOr(std::string_view key, int fallback) {
+    const std::string text = Find(key).value_or("");
+    int number = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    return error == std::errc() && end == text.data() + text.size() ? number : fallback;
 }
 
 void Settings::Set(std::string_view key, std::string_view value) {

@@ -18,6 +18,8 @@ class Settings {
     explicit Settings(Store& store) : connection_(store.connection()) {}
 
     std::optional<std::string> Find(std::string_view key);
+    // The setting's number, or fallback where there is none.
+    int NumberOr(std::string_view key, int fallback);
     // key: 1 to 64 bytes; value: at most 65,536, without control characters, so in one line. Raises the revision.
     // Throws InvalidRecord.
     void Set(std::string_view key, std::string_view value);

@@ -10,15 +10,17 @@ namespace lookhaven::store {
 template <>
 struct Mapping<User> {
     static constexpr const char* kTable = "users";
-    static constexpr const char* kColumns = "id, name, privilege";
-    static auto Members(auto& user) { return std::tie(user.id, user.name, user.privilege); }
+    static constexpr const char* kColumns = "id, name, privilege, may_mark";
+    static auto Members(auto& user) { return std::tie(user.id, user.name, user.privilege, user.may_mark_as_viewer); }
 };
 
 template <>
 struct Mapping<VerifiedUser> {
     static constexpr const char* kTable = "users";
-    static constexpr const char* kColumns = "id, name, privilege, password_hash";
-    static auto Members(auto& user) { return std::tie(user.id, user.name, user.privilege, user.password_hash); }
+    static constexpr const char* kColumns = "id, name, privilege, may_mark, password_hash";
+    static auto Members(auto& user) {
+        return std::tie(user.id, user.name, user.privilege, user.may_mark_as_viewer, user.password_hash);
+    }
 };
 
 namespace {
@@ -167,6 +169,21 @@ void Users::DenyItem(int id, DeniableItem kind, int item_id) {
 void Users::AllowItem(int id, DeniableItem kind, int item_id) {
     connection_.Write([&](soci::session& sql) {
         AllowRows(sql, kDeniedItems, id, item_id, std::initializer_list<DeniableItem>{kind});
+    });
+}
+
+void Users::DenyMarks(int id) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        Execute(sql, "update users set may_mark = 0 where id = :id", id);
+        EndSessions(sql, id);
+    });
+}
+
+void Users::AllowMarks(int id) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        Execute(sql, "update users set may_mark = 1 where id = :id", id);
     });
 }
 

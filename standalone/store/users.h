@@ -31,8 +31,11 @@ struct User {
     int id = 0;  // from 1, never used twice
     std::string name;
     Privilege privilege = Privilege::kViewer;
+    bool may_mark_as_viewer = false;
 
     bool IsManager() const { return privilege <= Privilege::kManager; }
+    // Whether the user may report alerts and POS transactions.
+    bool MayMark() const { return IsManager() || may_mark_as_viewer; }
 };
 
 // A user whose password was right, with the hash that said so: it is gone once the password changes.
@@ -69,6 +72,9 @@ class Users {
     // item_id need not exist (yet, or any more).
     void DenyItem(int id, DeniableItem kind, int item_id);
     void AllowItem(int id, DeniableItem kind, int item_id);
+    // A new account may not report marks, unless it is a manager's, which always may.
+    void DenyMarks(int id);
+    void AllowMarks(int id);
     void Remove(int id);
 
     // The cameras at which the user lacks that access, by themselves or as members of a denied group; empty for an

@@ -17,6 +17,11 @@ export function isSameFootage(one: FootageRef, other: FootageRef | null | undefi
   return one.kind === other?.kind && one.id === other.id;
 }
 
+/** What a mark says and who says so, a line each; empty for a recording. */
+export function describeMark({ text, reporter }: Footage): string {
+  return [text, reporter && `Reported by ${reporter}`].filter(Boolean).join("\n");
+}
+
 /** Something that can be played. */
 export interface Footage extends FootageRef {
   camera: number;
@@ -33,6 +38,8 @@ export interface Footage extends FootageRef {
   reason: number;
   /** Of a mark, else empty. */
   text: string;
+  /** The account that reported a mark; empty where nobody is named. */
+  reporter: string;
   /** There is something to play. */
   isSaved: boolean;
 }
@@ -77,6 +84,7 @@ interface RawMark {
   stop: number;
   /** Pending: the footage is not complete yet; missed: there is none. */
   state: "pending" | "saved" | "missed";
+  reported_by: string;
   text: string[];
 }
 
@@ -224,11 +232,12 @@ function footageOf(raw: RawEvent, camera: number): Footage {
     isGrowing: raw.is_recording,
     reason: raw.record_type,
     text: "",
+    reporter: "",
     isSaved: true,
   };
 }
 
-function markOf({ id, kind, camera_id, start, stop, time, state, text }: RawMark): Footage {
+function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, text }: RawMark): Footage {
   const unknown = { frameCount: 0, isGrowing: false, reason: 0 };
   return {
     id,
@@ -238,6 +247,7 @@ function markOf({ id, kind, camera_id, start, stop, time, state, text }: RawMark
     stop,
     moment: time,
     text: text.join("\n"),
+    reporter: reported_by,
     isSaved: state === "saved",
     ...unknown,
   };

@@ -168,7 +168,7 @@ function rawEvent({ id, start, stop, frames, reason = 1, isGrowing = false }: Re
 }
 
 function rawMark({ id, kind, camera, start, stop, text = "" }: Recorded) {
-  return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", text: text.split("\n") };
+  return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", reported_by: "till", text: text.split("\n") };
 }
 
 function part(type: string, body: Uint8Array): Uint8Array {

@@ -10,6 +10,7 @@
 #include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 #include "test/support/footage/footage.h"
 #include "test/support/host/host_under_test.h"
@@ -39,6 +40,12 @@ class EventApi : public testing::Test {
 
 TEST_F(EventApi, MarksAndListsWhatHappened) {
     const std::string mark = "Event&version=1&method=Mark";
+    store::Users users(footage_.Records());
+    store::Settings settings(footage_.Records());
+    EXPECT_EQ(Ask(mark, "kind=alert&camera=1", true).status, 403) << "a viewer writes no evidence";
+    users.AllowMarks(2);
+    footage_.Record(1, 999'000, 1);
+    footage_.Record(2, 1'999'000, 1);
     const Json::Value sale =
         Ask(mark, "kind=pos&camera=1&start=1000000&length=20&text=1+Coffee%0A2+Tea").Json()["data"];
     EXPECT_EQ(sale["kind"], "pos");
@@ -48,7 +55,14 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
     const Answer lines = host_.Ask("api=VEXO." + mark, admin_, {{"CONTENT_TYPE", "application/json"}},
                                    R"({"kind": "alert", "camera": 2, "start": 2000000, "text": ["door", "opened"]})");
     EXPECT_EQ(lines.Json()["data"]["text"][1], "opened");
-    EXPECT_EQ(Ask(mark, "kind=alert&camera=1", true).status, 200) << "now, for a moment";
+    settings.Set("marks_per_day", "1");
+    EXPECT_EQ(Ask(mark, "kind=alert&camera=1").status, 429) << "this account's share of the day";
+    const Answer now = Ask(mark, "kind=alert&camera=1", true);
+    EXPECT_EQ(now.Json()["data"]["reported_by"], "guest") << "now, for a moment";
+    EXPECT_EQ(Ask(mark, "kind=alert&camera=1", true).status, 429);
+    users.DenyMarks(2);
+    viewer_ = host_.LogIn("guest").secret;
+    EXPECT_EQ(Ask(mark, "kind=alert&camera=1", true).status, 403);
     const std::string list = "Event&version=1&method=List";
     const auto kinds = [&](const std::string& query, bool as_viewer) {
         std::string found;
@@ -69,7 +83,10 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
 }
 
 TEST_F(EventApi, RefusesBadInput) {
-    const std::string late = std::to_string(base::WallMillis() / 1000 + 7200);
+    store::Users(footage_.Records()).AllowMarks(2);
+    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::string late = std::to_string(now_s + 600);
+    const std::string early = std::to_string(now_s - 600);
     std::string many;
     for (int id = 1; id <= 1001; ++id) {
         many += std::to_string(id) + ",";
@@ -88,11 +105,13 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Mark", "kind=pos&camera=0", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=x", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=99", 404},
-        {"Event&version=1&method=Mark", "kind=pos&camera=2", 403, true},
-        {"Event&version=1&method=Mark", "kind=pos&camera=3", 403, true},
+        {"Event&version=1&method=Mark", "kind=pos&camera=2", 404, true},
+        {"Event&version=1&method=Mark", "kind=pos&camera=3", 404, true},
+        {"Event&version=1&method=Mark&privData={\"privilege\":2}", "kind=pos&camera=1", 403},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=0", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=-9223372036854775808", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=" + late, 400},
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=" + early, 400},  // before there was footage
         {"Event&version=1&method=Mark", "kind=pos&camera=1&length=-1", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&length=3601", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&text=a%07b", 400},

@@ -123,6 +123,8 @@ TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
         {"allow", [&] { users_.Allow(id, 2); }, false},
         {"deny", [&] { users_.Deny(id, 2, {CameraAccess::kAudio}); }, true},
         {"deny item", [&] { users_.DenyItem(id, DeniableItem::kDoor, 3); }, true},
+        {"allow marks", [&] { users_.AllowMarks(id); }, false},
+        {"deny marks", [&] { users_.DenyMarks(id); }, true},
         {"password", [&] { users_.SetPassword(id, "another one"); }, true},
         {"end of user", [&] { EXPECT_EQ(sessions_.EndOfUser(id), 1); }, true},
         {"removal", [&] { users_.Remove(id); }, true},

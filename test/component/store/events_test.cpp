@@ -216,6 +216,10 @@ TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
     EXPECT_FALSE(marks_.Remove(pos.id) || marks_.Save(pos.id, 7, "x") || marks_.Miss(pos.id));
 
     EXPECT_THROW(marks_.Add(MarkKind::kAlert, 99, 100, 0, ""), NotFound);
+    const Mark told = marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, kDay);
+    EXPECT_EQ(marks_.Find(MarkKind::kAlert, told.id)->reporter, (Reporter{7, "till"}));
+    EXPECT_EQ(marks_.CountReportedBy(7, kDay) * 10 + marks_.CountReportedBy(7, kDay + 1), 10);
+    EXPECT_EQ(marks_.CountReportedBy(0, 0), 0) << "nobody's";
     for (const auto& [moment, length] : {std::pair<std::int64_t, std::int64_t>{-1, 0},
                                          {kNever, 0},
                                          {1LL << 31, 0},

@@ -3,7 +3,7 @@
 // The events and marks of a span as rows, newest first; only the rows on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
-import { isSameFootage, type Footage, type FootageRef } from "../../wire/recordings";
+import { isSameFootage, describeMark, type Footage, type FootageRef } from "../../wire/recordings";
 import { element, setText } from "../widgets/dom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 
@@ -124,7 +124,7 @@ export class EventList {
     side.classList.toggle("growing", one.isGrowing);
     button.disabled = !one.isSaved;
     button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
-    button.title = `${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}${one.text ? `\n${one.text}` : ""}`;
+    button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describeMark(one)].filter(Boolean).join("\n");
     button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
   }
 
