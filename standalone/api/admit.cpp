@@ -85,7 +85,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
     if (cookie == call.cookies.end() || cookie->second.empty()) {
         return std::nullopt;
     }
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     store::Sessions sessions(call.Records());
     const auto session = sessions.FindBySecret(cookie->second, now_s);
     if (!session) {
@@ -118,8 +118,8 @@ void Admit(const Call& call, const RequestLimits& limits) {
     }
 }
 
-void AdmitPeer(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
-    Occupy(slots, slot, store::kPeerUserId, limits.per_user, limits.but_managers);
+void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
+    Occupy(slots, slot, store::kPairedHostUserId, limits.per_user, limits.but_managers);
 }
 
 }  // namespace lookhaven::api

@@ -40,6 +40,6 @@ Load LoadOf(const Call& call);
 void Admit(const Call& call, const RequestLimits& limits);
 
 // Counts the request as one of the paired hosts. Throws Failure 503 beyond a limit.
-void AdmitPeer(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits);
+void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits);
 
 }  // namespace lookhaven::api

@@ -40,7 +40,7 @@ class HashingPlace {
 };
 
 std::int64_t NowSeconds() {
-    return base::WallMillis() / 1000;
+    return base::WallSeconds();
 }
 
 std::string CookieLine(const http::Request& request, const std::string& value) {
@@ -97,14 +97,14 @@ std::string LogIn(const Call& call) {
     try {
         const store::VerifiedUser user = CheckPassword(call, account);
         const store::NewSession session = store::Sessions(records).Create(user, NowSeconds());
-        LogAccepted(call.context.Home(), user.name, address);
+        LogAccepted(call.context.Installation(), user.name, address);
         return SuccessAnswer(Identity(records, user.name, user.id, user.IsManager()),
                              CookieLine(call.request, session.secret));
     } catch (const Failure& failure) {
-        LogRefused(call.context.Home(), account, address, failure.what());
+        LogRefused(call.context.Installation(), account, address, failure.what());
         throw;
     } catch (const store::NotFound&) {  // removed, or its password changed, in this moment
-        LogRefused(call.context.Home(), account, address, "the account has changed in this moment");
+        LogRefused(call.context.Installation(), account, address, "the account has changed in this moment");
         throw Failure(401, "wrong account or password");
     }
 }

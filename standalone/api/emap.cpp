@@ -163,7 +163,7 @@ std::string Report(const Call& call) {
     const Json::Value port = call.Parameter("portIdx");
     store::Devices(call.Records())
         .Report({kind == "door" ? EmapItemType::kDoor : EmapItemType::kIoModule, call.Parameter("id").asInt(),
-                 port.isNull() ? -1 : port.asInt(), call.Parameter("state").asString(), base::WallMillis() / 1000});
+                 port.isNull() ? -1 : port.asInt(), call.Parameter("state").asString(), base::WallSeconds()});
     return SuccessAnswer(Json::objectValue);
 }
 

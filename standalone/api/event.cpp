@@ -60,10 +60,6 @@ Json::Value LinesOf(const std::string& text) {
     return lines;
 }
 
-const char* NameOf(store::MarkState state) {
-    return state == store::MarkState::kSaved ? "saved" : state == store::MarkState::kMissed ? "missed" : "pending";
-}
-
 Json::Value Describe(const store::Mark& mark) {
     Json::Value json;
     json["id"] = mark.id;
@@ -72,7 +68,7 @@ Json::Value Describe(const store::Mark& mark) {
     json["time"] = Json::Int64{mark.moment_s};
     json["start"] = Json::Int64{mark.start_s};
     json["stop"] = Json::Int64{mark.end_s};
-    json["state"] = NameOf(mark.state);
+    json["state"] = store::NameOf(mark.state);
     json["reported_by"] = mark.reporter.name;
     json["text"] = LinesOf(mark.text);
     return json;
@@ -138,7 +134,7 @@ std::string MarkIt(const Call& call) {
         throw Failure(400, "kind must be alert or pos");
     }
     const int camera = static_cast<int>(call.Parameter("camera").asInt());
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     const std::int64_t start_s = call.NumberOr("start", now_s);
     const std::int64_t length_s = call.NumberOr("length", 0);
     if (camera < 1 || start_s < 1 || length_s < 0 || length_s > store::kMaxMarkSeconds) {
@@ -179,7 +175,7 @@ std::string List(const Call& call) {
     filter.camera_ids = CamerasOf(call);
     filter.kind = KindOf(call);
     filter.begin_s = call.NumberOr("from", 0);
-    filter.end_s = call.NumberOr("to", base::WallMillis() / 1000 + kMaxAheadSeconds);
+    filter.end_s = call.NumberOr("to", base::WallSeconds() + kMaxAheadSeconds);
     filter.newest_first = true;
     const std::int64_t offset = call.NumberOr("offset", 0);
     const std::int64_t limit = call.NumberOr("limit", 1000);

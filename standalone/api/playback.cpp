@@ -42,7 +42,8 @@ control::Pause ChangePause(const control::SlotUse& use, const std::function<void
 }
 
 control::ProgressFile ProgressOf(const Call& call, const control::Player& player) {
-    auto file = control::ProgressFile::Open(call.context.Home().ProgressFolder(), player.key, call.context.Session());
+    auto file =
+        control::ProgressFile::Open(call.context.Installation().ProgressFolder(), player.key, call.context.Session());
     if (!file) {
         throw Failure(409, "the player cannot be reached under this timestamp");
     }

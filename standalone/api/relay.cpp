@@ -13,7 +13,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
-#include "standalone/remote/live_view.h"
+#include "standalone/remote/fetch.h"
 #include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 
@@ -22,7 +22,7 @@ namespace lookhaven::api {
 namespace {
 
 // Sends the answer on as this host's own.
-class Relay : public remote::LiveSink {
+class Relay : public remote::Sink {
   public:
     explicit Relay(const Call& call) : call_(call), output_(*call.context.output()) {}
 
@@ -70,8 +70,8 @@ std::string Play(const Call& call) {
         throw Failure(404, kNoSuchCamera);
     }
     const std::string id = std::to_string(camera->id_on_server);
-    const std::string timestamp = std::to_string(base::WallMillis() / 1000);
-    remote::LiveRequest request;
+    const std::string timestamp = std::to_string(base::WallSeconds());
+    remote::Request request;
     request.query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
                     Passed(call, "snapshot") + Passed(call, "profileType");
     request.cookie = "timestamp=" + timestamp;
@@ -83,7 +83,7 @@ std::string Play(const Call& call) {
     Relay relay(call);
     try {
         remote::FetchLiveView({server->address, server->port, server->certificate}, request, relay);
-    } catch (const remote::NoLiveView& error) {
+    } catch (const remote::NoAnswer& error) {
         base::LogWarning("no live view from " + server->name + ": " + error.what());
         throw Failure(502, "the recording server does not answer, or does not let this host in");
     }

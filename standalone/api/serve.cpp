@@ -96,7 +96,7 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
         throw Failure(405, "this method takes POST only");
     }
     if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {
-        throw Failure(403, "only an administrator may do this");
+        throw Failure(403, "only a manager may do this");
     }
     try {
         return method.serve(call);
@@ -164,7 +164,7 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
         LimitAddressSpace(RLIM_INFINITY);
     };
     events.on_player = [&slots, &slot](std::int64_t key) { slots.BeginPlayer(slot, key); };
-    events.on_peer = [&service, &slots, &slot] { AdmitPeer(slots, slot, service.limits); };
+    events.on_paired_host = [&service, &slots, &slot] { AdmitPairedHost(slots, slot, service.limits); };
     binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);

@@ -29,7 +29,7 @@ void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) 
 void Watch(const base::Installation& installation, control::SlotTable& slots) {
     store::Store records = store::Store::Open(installation.StoreUrl());
     for (std::int64_t purged_s = 0;; std::this_thread::sleep_for(kPeriod)) {
-        const std::int64_t now_s = base::WallMillis() / 1000;
+        const std::int64_t now_s = base::WallSeconds();
         Look(records, slots, now_s);
         if (now_s - purged_s >= kPurgePeriodSeconds) {
             store::Sessions(records).PurgeExpired(now_s);

@@ -25,6 +25,10 @@ std::int64_t WallMillis() {
     return Micros(CLOCK_REALTIME) / 1000;
 }
 
+std::int64_t WallSeconds() {
+    return WallMillis() / 1000;
+}
+
 std::string FormatUtc(std::int64_t wall_millis) {
     const std::time_t seconds = static_cast<std::time_t>(wall_millis / 1000);
     std::tm parts{};

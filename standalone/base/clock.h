@@ -11,8 +11,9 @@ namespace lookhaven::base {
 // Microseconds of CLOCK_MONOTONIC: comparable between processes of the machine, not across a reboot.
 std::int64_t MonotonicMicros();
 
-// Milliseconds since the epoch (UTC).
+// Since the epoch (UTC).
 std::int64_t WallMillis();
+std::int64_t WallSeconds();
 
 // "2026-03-01T08:15:30.123Z"
 std::string FormatUtc(std::int64_t wall_millis);

@@ -24,8 +24,9 @@ namespace {
 control::CommonConfig* CommonRecord() {
     static control::CommonConfig* record = nullptr;
     if (record == nullptr) {
-        record = OrFailure<control::CommonConfig*>(
-            "common configuration", nullptr, [] { return control::MapCommonConfig(RequestContext::Current().Home()); });
+        record = OrFailure<control::CommonConfig*>("common configuration", nullptr, [] {
+            return control::MapCommonConfig(RequestContext::Current().Installation());
+        });
     }
     return record;
 }

@@ -24,7 +24,7 @@ namespace base = lookhaven::base;
 namespace store = lookhaven::store;
 using lookhaven::binding::IdSet;
 using lookhaven::binding::OrFailure;
-using lookhaven::binding::RecordOf;
+using lookhaven::binding::PlatformCamera;
 using lookhaven::binding::RequestContext;
 
 static_assert(static_cast<int>(base::Codec::kMjpeg) == CAM_VIDEO_MJPEG);
@@ -42,7 +42,7 @@ constexpr unsigned int kPtzMoves = 1;  // of the PTZ abilities: the camera turns
 
 namespace lookhaven::binding {
 
-Camera RecordOf(const store::Camera& from) {
+Camera PlatformCamera(const store::Camera& from) {
     Camera to;
     to.m_Id = from.id;
     from.name.copy(to.m_szName, sizeof to.m_szName - 1);
@@ -105,7 +105,7 @@ int Camera::Load(int camId, int serverId, int archiveId) {
         if (!record) {
             return -1;
         }
-        *this = RecordOf(*record);
+        *this = PlatformCamera(*record);
         return 0;
     });
 }
@@ -144,7 +144,7 @@ std::list<Camera> GetCamLocalList(bool onlyEnabled, const std::string& groupIds,
     for (const store::Camera& record : store::Cameras(records).List()) {
         if (!denied.contains(record.id) && (record.enabled || !onlyEnabled) &&
             (groupIds.empty() || members.contains(record.id))) {
-            cameras.push_back(RecordOf(record));
+            cameras.push_back(PlatformCamera(record));
         }
     }
     return cameras;

@@ -11,7 +11,7 @@
 
 namespace lookhaven::binding {
 
-Camera RecordOf(const store::Camera& camera);
+Camera PlatformCamera(const store::Camera& camera);
 
 // The numbers in a list of ids that is joined by ",".
 std::set<int> IdSet(std::string_view list);

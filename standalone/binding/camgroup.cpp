@@ -19,7 +19,7 @@ using lookhaven::binding::RequestContext;
 namespace {
 
 // A camera that was removed leaves its id and its recordings.
-Camera RecordOfRemoved(int id) {
+Camera RemovedCamera(int id) {
     Camera camera;
     camera.m_Id = id;
     return camera;
@@ -29,12 +29,12 @@ std::map<int, Camera> RecordsOf(const std::set<int>& ids, bool with_removed) {
     std::map<int, Camera> cameras;
     for (const store::Camera& record : store::Cameras(RequestContext::Current().Records()).List()) {
         if (ids.contains(record.id)) {
-            cameras.emplace(record.id, lookhaven::binding::RecordOf(record));
+            cameras.emplace(record.id, lookhaven::binding::PlatformCamera(record));
         }
     }
     for (const int id : ids) {
         if (with_removed && !cameras.contains(id)) {
-            cameras.emplace(id, RecordOfRemoved(id));
+            cameras.emplace(id, RemovedCamera(id));
         }
     }
     return cameras;

@@ -98,7 +98,7 @@ std::string LoadEmapImgBase64String(const std::string& imageName, int& length) {
     const std::string text = OrFailure("LoadEmapImgBase64String", std::string(), [&] {
         RequestContext& context = RequestContext::Current();
         return lookhaven::base::ToBase64(
-            lookhaven::emap::Pictures(context.Records(), context.Home().Home()).Read(imageName));
+            lookhaven::emap::Pictures(context.Records(), context.Installation().Home()).Read(imageName));
     });
     length = static_cast<int>(text.size());
     return text;

@@ -63,7 +63,7 @@ bool LoadMark(Event& event, store::MarkKind kind, int id) {
 
 namespace lookhaven::binding {
 
-Event RecordOf(const store::Event& from, const std::string& mount_path) {
+Event PlatformEvent(const store::Event& from, const std::string& mount_path) {
     Event to;
     to.m_Id = from.id;
     to.m_CamId = from.camera_id;
@@ -108,7 +108,7 @@ int Event::Load(int eventId, int mountId, int serverId, int archiveId) {
         if (!fits || !MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
             return -1;
         }
-        *this = lookhaven::binding::RecordOf(*event, MountPath(event->mount_id));
+        *this = lookhaven::binding::PlatformEvent(*event, MountPath(event->mount_id));
         return 0;
     });
 }
@@ -209,7 +209,7 @@ int DoEventTimelyPlay(const Event& event, REC_EVENT_TYPE type) {
         RequestContext& context = RequestContext::Current();
         context.CloseRecords();
         const bool flushed =
-            type == REC_EVENT_RECORDED && lookhaven::control::FlushRequests(context.Home()).Ask(event.GetId());
+            type == REC_EVENT_RECORDED && lookhaven::control::FlushRequests(context.Installation()).Ask(event.GetId());
         return flushed ? 0 : -1;
     });
 }

@@ -10,6 +10,6 @@
 
 namespace lookhaven::binding {
 
-Event RecordOf(const store::Event& event, const std::string& mount_path);
+Event PlatformEvent(const store::Event& event, const std::string& mount_path);
 
 }  // namespace lookhaven::binding

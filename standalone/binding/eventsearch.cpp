@@ -74,7 +74,7 @@ int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
             mount_paths[mount.id] = mount.path;
         }
         for (const store::Event& event : store::Events(records).List(FilterOf(filter))) {
-            events.push_back(lookhaven::binding::RecordOf(event, mount_paths[event.mount_id]));
+            events.push_back(lookhaven::binding::PlatformEvent(event, mount_paths[event.mount_id]));
         }
         return 0;
     });

@@ -77,11 +77,11 @@ bool HasStream(store::Store& records, int camera_id, int stream) {
 
 // Waits for a ring with a frame of this start; null when none comes in time, the recorder dies or a signal arrives.
 void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
-    control::Demand demand(context.Home());
+    control::Demand demand(context.Installation());
     void* stream = nullptr;
     for (const std::int64_t start = MonotonicMicros();;) {
         if (stream == nullptr) {
-            stream = ring::Attach(context.Home(), id);
+            stream = ring::Attach(context.Installation(), id);
         }
         if (stream != nullptr && !ring::IsRetired(stream) && ring::HasFrameOfThisStart(stream)) {
             return stream;
@@ -130,7 +130,7 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
             return nullptr;
         }
         const ring::StreamId id{camId, streamNo, base::Medium::kAudio};
-        void* sound = context.MayHear() ? ring::Attach(context.Home(), id) : nullptr;
+        void* sound = context.MayHear() ? ring::Attach(context.Installation(), id) : nullptr;
         return sound != nullptr ? sound : ring::AttachEmpty(id, {});
     });
     return static_cast<ShmStreamFifo*>(stream);
@@ -203,7 +203,7 @@ void LiveStreamUpdater::UpdateStamp() {
         const RequestContext& context = RequestContext::Current();
         const control::LiveStream stream{m_CamId, m_StreamNo};
         if (context.GrantedStream() == stream) {
-            static control::Demand demand(context.Home());
+            static control::Demand demand(context.Installation());
             demand.Request(stream);
         }
         return 0;

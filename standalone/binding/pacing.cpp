@@ -57,7 +57,7 @@ ProgressIndicator::ProgressIndicator(long long key, bool create, bool owner) : m
             context.NotePlayer(key);  // first: the host sweeps the files of the players that it knows
         }
         if (!context.Session().empty()) {
-            const std::filesystem::path folder = context.Home().ProgressFolder();
+            const std::filesystem::path folder = context.Installation().ProgressFolder();
             m_pChannel->file = create || owner ? ProgressFile::Own(folder, key, context.Session())
                                                : ProgressFile::Open(folder, key, context.Session());
         }

@@ -20,7 +20,7 @@ using lookhaven::binding::RequestContext;
 static_assert(static_cast<int>(store::CameraAccess::kLive) == CAM_PRIV_LIVEVIEW);
 static_assert(static_cast<int>(store::CameraAccess::kPlayback) == CAM_PRIV_PLAYBACK);
 static_assert(static_cast<int>(store::CameraAccess::kAudio) == CAM_PRIV_AUDIO);
-static_assert(store::kPeerUserId == PAIR_AUTH_UID);
+static_assert(store::kPairedHostUserId == PAIR_AUTH_UID);
 
 namespace lookhaven::binding {
 

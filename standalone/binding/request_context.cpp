@@ -37,7 +37,7 @@ void RequestContext::Begin(const base::Installation& installation, Output* outpu
     g_pDbgLogCfg = static_cast<DbgLogCfg*>(const_cast<void*>(config));
 }
 
-const base::Installation& RequestContext::Home() const {
+const base::Installation& RequestContext::Installation() const {
     if (!installation_) {
         throw std::logic_error("this process serves no request");
     }
@@ -46,7 +46,7 @@ const base::Installation& RequestContext::Home() const {
 
 store::Store& RequestContext::Records() {
     if (records_ == nullptr) {
-        records_ = std::make_unique<store::Store>(store::Store::Open(Home().StoreUrl()));
+        records_ = std::make_unique<store::Store>(store::Store::Open(Installation().StoreUrl()));
     }
     return *records_;
 }

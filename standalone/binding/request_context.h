@@ -31,7 +31,7 @@ struct RequestEvents {
     // The process plays recordings, reachable under the client's stream key; its player file is written.
     std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
     // The caller has proved to be a paired host. May throw, which ends the request.
-    std::function<void()> on_peer = [] {};
+    std::function<void()> on_paired_host = [] {};
 };
 
 // The rights that a request's "privData" leaves to its caller, whoever that is.
@@ -60,7 +60,7 @@ class LH_PLATFORM_API RequestContext {
     void Begin(const base::Installation& installation, Output* output, RequestEvents events = {});
 
     // Throws std::logic_error before Begin.
-    const base::Installation& Home() const;
+    const base::Installation& Installation() const;
     Output* output() const { return output_; }
 
     // The record store, opened by the first call. Throws store::StoreError.
@@ -69,7 +69,7 @@ class LH_PLATFORM_API RequestContext {
     // is about to send or to wait calls this; references from Records are invalid afterwards.
     void CloseRecords();
 
-    // The caller: a user's id, PAIR_AUTH_UID for a peer, 0 for nobody.
+    // The caller: a user's id, PAIR_AUTH_UID for a paired host, 0 for nobody.
     unsigned int Caller() const { return caller_; }
     void SetCaller(unsigned int user_id) { caller_ = user_id; }
     // The handle of the caller's session; empty when there is none.
@@ -90,7 +90,7 @@ class LH_PLATFORM_API RequestContext {
     // The answer is a stream, which may run for as long as the client likes.
     void NoteStream();
     void NotePlayer(std::int64_t key) { events_.on_player(key); }
-    void NotePeer() { events_.on_peer(); }
+    void NotePairedHost() { events_.on_paired_host(); }
     // The answer is a picture, alone or in a stream.
     void NotePicture() { wants_picture_ = true; }
     bool WantsPicture() const { return !is_hidden_ && (wants_picture_ || is_stream_); }

@@ -109,10 +109,10 @@ std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabl
 
 // A caller with a valid pair token is the paired host from here on, whatever session came along.
 bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
-    const bool is_peer = OrFailure("IsAuthPairMatch", false, [&] {
+    const bool is_paired_host = OrFailure("IsAuthPairMatch", false, [&] {
         const std::int64_t now = UtcSeconds();
         bool matches = false;
-        for (const std::string& secret : Servers().InboundPeerSecrets()) {
+        for (const std::string& secret : Servers().SecretsOfPairedHosts()) {
             matches |= store::PairTokenMatches(cookie, timestamp, secret, now);
         }
         if (matches) {
@@ -120,10 +120,10 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
         }
         return matches;
     });
-    if (is_peer) {
-        RequestContext::Current().NotePeer();
+    if (is_paired_host) {
+        RequestContext::Current().NotePairedHost();
     }
-    return is_peer;
+    return is_paired_host;
 }
 
 SlaveHxAuthentication::SlaveHxAuthentication() = default;

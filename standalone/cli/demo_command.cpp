@@ -48,7 +48,7 @@ Json::Value ToData(const demo::EventCounts& added) {
 
 void RecordFootage(const Console& console) {
     store::Store store = console.OpenStore();
-    const demo::EventCounts added = OrFail([&] { return demo::RecordFootage(store, base::WallMillis() / 1000); });
+    const demo::EventCounts added = OrFail([&] { return demo::RecordFootage(store, base::WallSeconds()); });
     console.Answer(ToData(added), "Recorded ", added.events, " events of the last days with ", added.marks,
                    " alerts and POS transactions.");
 }
@@ -68,7 +68,7 @@ void GenerateEvents(const Console& console, const Request& request) {
     }
     store::Store store = console.OpenStore();
     const demo::EventCounts added =
-        OrFail([&] { return demo::GenerateEvents(store, *request.count, request.days, base::WallMillis() / 1000); });
+        OrFail([&] { return demo::GenerateEvents(store, *request.count, request.days, base::WallSeconds()); });
     console.Answer(ToData(added), "Generated ", added.events, " events and ", added.marks,
                    " alerts and POS transactions, all without footage.");
 }

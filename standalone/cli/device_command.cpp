@@ -135,7 +135,7 @@ void Remove(const Console& console, const Request& request) {
 void Report(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
-    Devices(store).Report({kind.type, request.id, request.port, request.state, base::WallMillis() / 1000});
+    Devices(store).Report({kind.type, request.id, request.port, request.state, base::WallSeconds()});
     console.Answer(Object("id", request.id, "state", request.state), "Reported ", kind.name, " ", request.id, " as ",
                    request.state, ".");
 }

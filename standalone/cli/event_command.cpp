@@ -56,7 +56,7 @@ struct Request {
 };
 
 std::int64_t NowSeconds() {
-    return base::WallMillis() / 1000;
+    return base::WallSeconds();
 }
 
 std::set<int> ChosenCameras(store::Store& store, const Request& request) {

@@ -9,10 +9,6 @@ namespace lookhaven::cli {
 
 namespace {
 
-const char* NameOf(store::MarkState state) {
-    return state == store::MarkState::kPending ? "pending" : state == store::MarkState::kSaved ? "saved" : "missed";
-}
-
 std::string MomentText(const Json::Value& moment) {
     return FormatMoment(moment.asInt64());
 }

@@ -9,13 +9,15 @@
 
 #include <unistd.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
-#include "standalone/cli/peer_request.h"
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
+#include "standalone/remote/fetch.h"
+#include "standalone/store/pair_token.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 
@@ -166,9 +168,11 @@ void ListCameras(const Console& console) {
 
 // Returns how many cameras are new here.
 int RefreshCameras(RecordingServers& servers, const RecordingServer& server) {
-    const std::string answer =
-        AskPeer(server, servers.FindSecret(server.id), "api=VEXO.Pairing&version=1&method=Cameras");
-    const Json::Value json = ParseJson(answer);
+    const std::string timestamp = std::to_string(base::WallSeconds());
+    const std::string token = store::MakePairToken(servers.FindSecret(server.id), timestamp);
+    const Json::Value json = ParseJson(remote::FetchJson(
+        {server.address, server.port, server.certificate},
+        {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));
     if (!json.isObject() || !json["data"].isObject() || !json["data"]["camera"].isArray()) {
         throw Failure(kDataError, "an answer that cannot be understood");
     }

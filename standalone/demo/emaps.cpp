@@ -39,7 +39,7 @@ Ids AddDevices(store::Store& store, const std::map<std::string, int>& cameras) {
                           .ports = {{0, {PortType::kInput, cameras.at("Parking")}}, {1, {PortType::kOutput, 0}}}});
     ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = "POS terminal", .camera_id = cameras.at("Entrance")});
     devices.SetCameraPorts(cameras.at("Entrance"), {1, 1});
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     devices.Report({EmapItemType::kDoor, ids.front_door, -1, "closed", now_s});
     devices.Report({EmapItemType::kDoor, ids.back_door, -1, "locked", now_s});
     devices.Report({EmapItemType::kIoModule, ids.io, 0, "off", now_s});

@@ -223,7 +223,7 @@ class Verification {
         for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
             expected.insert(mark.path);
         }
-        const std::int64_t newest_s = base::WallMillis() / 1000 - kMinAgeS;
+        const std::int64_t newest_s = base::WallSeconds() - kMinAgeS;
         for (const MountFolder::File& file : mount.Files()) {
             if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < newest_s) {
                 Try([&] { CheckStray(mount, mount_id, file.name, rows.empty()); });

@@ -31,7 +31,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
 // The cameras that a pending mark needs footage of now, and until when.
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
     std::map<int, std::int64_t> until_s;
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     for (const store::Mark& mark : rows_.PendingMarks()) {
         if (catalog.cameras.contains(mark.camera_id) && mark.start_s <= now_s && now_s < mark.end_s) {
             until_s[mark.camera_id] = std::max(until_s[mark.camera_id], mark.end_s);
@@ -139,7 +139,7 @@ bool RecordingSupervisor::HasEnded() {
 }
 
 void RecordingSupervisor::Maintain(store::Store& store) {
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     MarkNewMounts(store);
     RecoverMounts(store, now_s);
     maintenance::CompleteMarks(store, now_s);

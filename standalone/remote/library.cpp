@@ -2,8 +2,8 @@
 //
 // The shared library liblookhaven-remote.so: one transfer by libcurl.
 //
-// Why so        The other host is trusted with the pictures that it sends and with nothing else: no header of its answer
-//               is passed on but the content type, and that only when it is one of a live view.
+// Why so        The other host is trusted with what it was asked for and with nothing else: no header of its answer is
+//               passed on but the content type, and that only when it is one of those expected.
 #include "standalone/remote/library.h"
 
 #include <algorithm>
@@ -24,7 +24,6 @@ constexpr long kMaxSilentSeconds = 60;
 // What lies in buffers of a viewer who cannot keep up is old.
 constexpr int kReceiveBytes = 192 << 10;
 constexpr std::size_t kMaxContentTypeBytes = 200;
-constexpr std::array<std::string_view, 2> kContentTypes = {"multipart/x-mixed-replace", "image/jpeg"};
 
 using List = std::unique_ptr<curl_slist, decltype(&curl_slist_free_all)>;
 
@@ -41,19 +40,20 @@ List ListOf(std::initializer_list<std::string> lines) {
     return list;
 }
 
-bool IsLiveViewType(std::string_view type) {
+bool IsOneOf(std::span<const std::string_view> types, std::string_view type) {
     const auto is_printable = [](char c) { return c >= ' ' && c <= '~'; };
     std::string name(type.substr(0, type.find(';')));
     name.erase(name.find_last_not_of(' ') + 1);
     std::ranges::transform(name, name.begin(), [](char c) { return c >= 'A' && c <= 'Z' ? c + ('a' - 'A') : c; });
     return type.size() <= kMaxContentTypeBytes && std::ranges::all_of(type, is_printable) &&
-           std::ranges::find(kContentTypes, name) != kContentTypes.end();
+           std::ranges::find(types, name) != types.end();
 }
 
 class Transfer {
   public:
-    Transfer(const Host& host, const LiveRequest& request, LiveSink& sink)
-        : sink_(sink),
+    Transfer(const Host& host, const Request& request, const Expected& expected, Sink& sink)
+        : expected_(expected),
+          sink_(sink),
           handle_(::curl_easy_init(), ::curl_easy_cleanup) {
         if (!handle_) {
             throw std::bad_alloc();
@@ -68,7 +68,9 @@ class Transfer {
         Set(CURLOPT_URL, ("https://" + name + ":" + port + "/webapi?" + request.query).c_str());
         Set(CURLOPT_CONNECT_TO, connect_to_.get());
         Set(CURLOPT_HTTPHEADER, headers_.get());
-        Set(CURLOPT_COPYPOSTFIELDS, request.form.c_str());
+        if (!request.form.empty()) {
+            Set(CURLOPT_COPYPOSTFIELDS, request.form.c_str());
+        }
         Set(CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1));
         Set(CURLOPT_PROTOCOLS_STR, "https");
         Set(CURLOPT_NOPROXY, "*");
@@ -76,6 +78,7 @@ class Transfer {
         Set(CURLOPT_CAINFO_BLOB, &certificate);
         Set(CURLOPT_CAPATH, static_cast<const char*>(nullptr));
         Set(CURLOPT_CONNECTTIMEOUT, kConnectSeconds);
+        Set(CURLOPT_TIMEOUT, static_cast<long>(expected.max_duration.count()));
         Set(CURLOPT_LOW_SPEED_LIMIT, 1L);
         Set(CURLOPT_LOW_SPEED_TIME, kMaxSilentSeconds);
         Set(CURLOPT_SOCKOPTFUNCTION, &Transfer::OnSocket);
@@ -87,15 +90,16 @@ class Transfer {
         Set(CURLOPT_ERRORBUFFER, problem_.data());
     }
 
-    void Run() {
+    bool Run() {
         const CURLcode result = ::curl_easy_perform(handle_.get());
         // An answer without a body has begun nothing either.
         if (!has_begun_ && result == CURLE_OK) {
-            RequireLiveView();
+            RequireExpected();
         }
         if (!has_begun_ && !is_refused_by_sink_) {
-            throw NoLiveView(problem_[0] != '\0' ? problem_.data() : ::curl_easy_strerror(result));
+            throw NoAnswer(problem_[0] != '\0' ? problem_.data() : ::curl_easy_strerror(result));
         }
+        return result == CURLE_OK;
     }
 
   private:
@@ -106,15 +110,15 @@ class Transfer {
         }
     }
 
-    // Throws NoLiveView.
-    void RequireLiveView() const {
+    // Throws NoAnswer.
+    void RequireExpected() const {
         long status = 0;
         ::curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
         if (status != 200) {
-            throw NoLiveView("it answers with status " + std::to_string(status));
+            throw NoAnswer("it answers with status " + std::to_string(status));
         }
-        if (!IsLiveViewType(ContentType())) {
-            throw NoLiveView("its answer is no live view");
+        if (!IsOneOf(expected_.content_types, ContentType())) {
+            throw NoAnswer("its answer is not what was asked for");
         }
     }
 
@@ -126,7 +130,7 @@ class Transfer {
 
     bool Take(std::span<const char> bytes) {
         if (!has_begun_) {
-            RequireLiveView();
+            RequireExpected();
             curl_off_t size = -1;
             ::curl_easy_getinfo(handle_.get(), CURLINFO_CONTENT_LENGTH_DOWNLOAD_T, &size);
             has_begun_ = sink_.Begin(ContentType(), size);
@@ -155,7 +159,8 @@ class Transfer {
         return CURL_SOCKOPT_OK;
     }
 
-    LiveSink& sink_;
+    const Expected& expected_;
+    Sink& sink_;
     List connect_to_{nullptr, curl_slist_free_all};
     List headers_{nullptr, curl_slist_free_all};
     std::array<char, CURL_ERROR_SIZE> problem_{};
@@ -168,7 +173,7 @@ class Transfer {
 
 }  // namespace lookhaven::remote
 
-void LookhavenFetchLiveView(const lookhaven::remote::Host& host, const lookhaven::remote::LiveRequest& request,
-                            lookhaven::remote::LiveSink& sink) {
-    lookhaven::remote::Transfer(host, request, sink).Run();
+bool LookhavenFetch(const lookhaven::remote::Host& host, const lookhaven::remote::Request& request,
+                    const lookhaven::remote::Expected& expected, lookhaven::remote::Sink& sink) {
+    return lookhaven::remote::Transfer(host, request, expected, sink).Run();
 }

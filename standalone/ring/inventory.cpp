@@ -42,7 +42,7 @@ void ForEachSegment(std::uint64_t installation, uid_t user,
         user);
 }
 
-// An administrator lists the segments of the user whose state folder it is.
+// Root lists the segments of the user whose state folder it is.
 uid_t UserOf(const base::Installation& installation) {
     struct stat status {};
     const bool is_root = ::geteuid() == 0;

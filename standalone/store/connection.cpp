@@ -110,7 +110,7 @@ int NextId(soci::session& sql, const std::string& counter) {
     return FetchOne<int>(sql,
                          "update counters set value = case when name = 'user' and value + 1 = :reserved then value + 2"
                          " else value + 1 end where name = :counter returning value",
-                         kPeerUserId, counter)
+                         kPairedHostUserId, counter)
         .value();
 }
 

@@ -69,6 +69,10 @@ std::vector<Mark> OfCamera(soci::session& sql, const MarkFilter& filter, int cam
 
 }  // namespace
 
+const char* NameOf(MarkState state) {
+    return state == MarkState::kSaved ? "saved" : state == MarkState::kMissed ? "missed" : "pending";
+}
+
 Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
                 const Reporter& reporter, std::int64_t now_s) {
     if (moment_s < 0 || moment_s > kLastMoment || length_s < 0 || length_s > kMaxMarkSeconds) {

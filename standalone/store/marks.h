@@ -26,6 +26,8 @@ enum class MarkState : int {
     kSaved = 1,    // the span file is on the mount
     kMissed = 2,   // nothing of the span was recorded
 };
+// "pending", "saved" or "missed".
+const char* NameOf(MarkState state);
 
 constexpr std::int64_t kMaxMarkSeconds = 3600;
 constexpr std::size_t kMaxMarkTextBytes = 8192;

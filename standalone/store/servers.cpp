@@ -225,7 +225,7 @@ std::string RecordingServers::FindSecret(int id) {
         .value_or("");
 }
 
-std::vector<std::string> RecordingServers::InboundPeerSecrets() {
+std::vector<std::string> RecordingServers::SecretsOfPairedHosts() {
     return connection_.FetchAll<std::string>("select secret from servers where enabled = 1 and address = ''"
                                              " order by id");
 }

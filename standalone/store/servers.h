@@ -16,7 +16,7 @@ namespace lookhaven::store {
 struct RecordingServer {
     int id = 0;                    // from 1, never used twice
     std::string name = {};         // UTF-8, 1 to 64 bytes, no other server's
-    std::string address = {};      // a host name or address; empty for a peer that connects to this host
+    std::string address = {};      // a host name or address; empty for one that only connects to this host
     int port = 0;                  // of its web server; 0 with an empty address
     std::string certificate = {};  // PEM, what its web server must show; given with an address
     bool enabled = true;
@@ -42,7 +42,7 @@ struct ServerDenial {
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) A secret comes out of InboundPeerSecrets and FindSecret alone, never with the record.
+//               (2) A secret comes out of SecretsOfPairedHosts and FindSecret alone, never with the record.
 class RecordingServers {
   public:
     // The store must outlive this object.
@@ -55,7 +55,7 @@ class RecordingServers {
     void Update(const RecordingServer& server, const std::optional<std::string>& secret = {});
     // Adds the server with its cameras, or updates the one of that name: a camera keeps its id here, and thereby who
     // is denied it, and one that is not among the cameras any more stays. Returns the id. Throws as Add; AlreadyExists
-    // where the name is that of a peer which connects to this host, and the other way round.
+    // where the name is that of a host that connects to this one, and the other way round.
     int Pair(const RecordingServer& server, const std::string& secret, const std::vector<RemoteCamera>& cameras);
     // Removes the server with its cameras and devices, and Denials(id) with them; their ids are not used again. Throws
     // NotFound.
@@ -68,9 +68,9 @@ class RecordingServers {
 
     // Empty for an unknown or disabled server.
     std::string FindSecret(int id);
-    // Of the enabled servers without an address: peers that connect to this host. The secret of a server that this host
+    // Of the enabled servers without an address: hosts that connect to this one. The secret of a server that this host
     // connects to admits nobody here.
-    std::vector<std::string> InboundPeerSecrets();
+    std::vector<std::string> SecretsOfPairedHosts();
 
     // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
     // Returns the id. Throws InvalidRecord, or NotFound for an unknown server.

@@ -14,8 +14,8 @@
 
 namespace lookhaven::store {
 
-// Stands for a peer admitted by pair matching; no account ever has this id.
-constexpr int kPeerUserId = 1024;
+// Stands for a host admitted by pair matching; no account ever has this id.
+constexpr int kPairedHostUserId = 1024;
 
 enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
 

@@ -61,7 +61,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     ring::Writer writer(installation, kStream, kFormat, kGeometry);
     WriteFrames(writer);
     auto* words = static_cast<std::uint64_t*>(writer.Address());
-    const std::size_t segment_bytes = reinterpret_cast<const ring::SegmentHead*>(words)->segment_bytes;
+    const std::size_t segment_bytes = ring::View(words).Constants().segment_bytes;
     for (int left = input.Take<std::uint8_t>(); left > 0; --left) {
         const std::size_t word = input.Take<std::uint16_t>() % (segment_bytes / sizeof(*words));
         words[word] = input.Take<std::uint64_t>();

@@ -27,7 +27,7 @@ struct Map {
     // The items of the answer.
     Json::Value Show() {
         LiveHandler handler(platform);
-        handler.m_bPairAuth = is_peer;
+        handler.m_bPairAuth = is_paired_host;
         handler.LiveviewEmap(5);
         error = handler.m_ErrCode;
         const Calls answers = platform.CallsFrom("SetSuccess(");
@@ -38,7 +38,7 @@ struct Map {
     }
 
     ScriptedPlatform platform;
-    bool is_peer = false;
+    bool is_paired_host = false;
     int error = 0;
     Json::Value answer;
 };
@@ -184,7 +184,7 @@ TEST(Emap, ShowsWhatIsThereAndAllowedInOrder) {
 
 TEST(Emap, FiltersOnlyForUsersAndOnlyWhatThereIs) {
     struct Row {
-        bool is_peer;
+        bool is_paired_host;
         std::vector<Item> items;
         bool filtered;
     };
@@ -195,7 +195,7 @@ TEST(Emap, FiltersOnlyForUsersAndOnlyWhatThereIs) {
             p.emap_items = {row.items.begin(), row.items.end()};
             p.denied_cameras = p.denied_emaps = p.denied_modules = {1};
         });
-        map.is_peer = row.is_peer;
+        map.is_paired_host = row.is_paired_host;
         EXPECT_EQ(map.Show().empty(), row.filtered);
         EXPECT_EQ(map.platform.CallsFrom("GetInaIOIdSet").empty(), !row.filtered);
     }

@@ -96,18 +96,18 @@ TEST(Authenticate, AsksInOrderAndNoMoreThanItNeeds) {
 }
 
 TEST(PrivProfile, IsLoadedOnceForTheLoginOrForAPeer) {
-    for (const bool is_peer : {false, true}) {
+    for (const bool is_paired_host : {false, true}) {
         ScriptedPlatform platform;
         platform.params["privData"]["privilege"] = 3;
         ProbeHandler handler(platform);
-        handler.m_bPairAuth = is_peer;
+        handler.m_bPairAuth = is_paired_host;
         PrivProfile* const profile = handler.GetPrivProfile();
         EXPECT_EQ(profile->GetPrivilege(), 3) << "narrowed from 2";
         EXPECT_EQ(handler.GetPrivProfile(), profile);
         const Calls load = {"GetParam(privData,null)", "UpdateByJson({\"privilege\":3})"};
-        EXPECT_EQ(platform.calls,
-                  (is_peer ? Calls{"PrivProfileGetByUid(1024)"} : Calls{"GetLoginUID()", "PrivProfileGetByUid(7)"}) +
-                      load);
+        EXPECT_EQ(platform.calls, (is_paired_host ? Calls{"PrivProfileGetByUid(1024)"}
+                                                  : Calls{"GetLoginUID()", "PrivProfileGetByUid(7)"}) +
+                                      load);
     }
 }
 

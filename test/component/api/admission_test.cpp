@@ -110,7 +110,7 @@ TEST_F(Admission, LogInsAndRefusalsAreLoggedCleanly) {
 TEST(Peers, AreOneUserTogether) {
     const HostUnderTest host({"--max-requests-per-user", "2"});
     store::Store records = store::Store::Open(host.Home().StoreUrl());
-    const std::string now = std::to_string(base::WallMillis() / 1000);
+    const std::string now = std::to_string(base::WallSeconds());
     std::vector<base::FileDescriptor> running;
     const auto open = [&](const std::string& secret) {
         return host.OpenQuery("api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=PeerStream&timestamp=" + now +
@@ -135,7 +135,7 @@ TEST(Peers, AreOneUserTogether) {
 TEST_F(Admission, AStoreThatCannotBeWrittenStillServesWhoIsLoggedIn) {
     store::Store records = store::Store::Open(host_.Home().StoreUrl());
     const auto user = store::Users(records).CheckPassword("admin", "right password");
-    const std::string idle = store::Sessions(records).Create(*user, base::WallMillis() / 1000 - 300).secret;
+    const std::string idle = store::Sessions(records).Create(*user, base::WallSeconds() - 300).secret;
     // Other writers wait for this transaction in vain.
     const int status = records.connection().Write(
         [&](soci::session&) { return host_.Ask("api=Test&version=1&method=Success", idle).status; });

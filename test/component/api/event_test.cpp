@@ -84,7 +84,7 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
 
 TEST_F(EventApi, RefusesBadInput) {
     store::Users(footage_.Records()).AllowMarks(2);
-    const std::int64_t now_s = base::WallMillis() / 1000;
+    const std::int64_t now_s = base::WallSeconds();
     const std::string late = std::to_string(now_s + 600);
     const std::string early = std::to_string(now_s - 600);
     std::string many;

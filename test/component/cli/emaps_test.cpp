@@ -22,7 +22,7 @@ TEST_F(EmapsTest, MapsAreMadeFilledCarriedOverAndRemoved) {
     const std::string plan = File("plan", "<svg width='4' height='3'/>");
     const std::string out = (folder_ / "map.json").string();
     Play({{"emap list", 0, "Ground floor"},
-          {"emap add Yard " + plan + " --hide-names", 0, "the id 3"},
+          {"emap add Yard " + plan + " --hide-names", 0, "id 3"},
           {"emap add Yard " + plan, 65, "already an e-map"},
           {"emap add Bad " + File("text", "hello"), 65, "PNG, JPEG, WebP or SVG"},
           {"emap add Bad /no/such", 66, "/no/such"},
@@ -51,15 +51,15 @@ TEST_F(EmapsTest, MapsAreMadeFilledCarriedOverAndRemoved) {
 }
 
 TEST_F(EmapsTest, DevicesAreKnownReportedAndDenied) {
-    Play({{"door add Shed --camera 1", 0, "the id 3"},
+    Play({{"door add Shed --camera 1", 0, "id 3"},
           {"door add Shed --camera 99", 66, "no camera 99"},
-          {"door report 3 open", 0, "is open"},
+          {"door report 3 open", 0, "as open"},
           {"door report 3 ajar", 65, "open, closed or locked"},
-          {"io add Box --port 0:in:1 --port 5:out", 0, "the id 2"},
+          {"io add Box --port 0:in:1 --port 5:out", 0, "id 2"},
           {"io add Box --port 0:inn", 64, "0:in"},
           {"io add Box --port 0:in --port 0:out", 64, "0:in"},
           {"io list", 0, "0:in:1 5:out"},
-          {"io report 2 on --port 5", 0, "is on"},
+          {"io report 2 on --port 5", 0, "as on"},
           {"io report 2 on --port 6", 66, "no port 6"},
           {"pos add Till2 --server 7 --id-on-server 1", 66, "no server 7"},
           {"pos set 1 --name Desk --json", 0, "\"Desk\""},

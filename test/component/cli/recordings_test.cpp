@@ -121,8 +121,7 @@ TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
 
 TEST_F(RecordingsTest, MarksArePutDownForTheRecorder) {
     Play({{"event mark 1 --at 2026-03-01T08:15:00Z --text 'at the door' --json", 0, "\"pending\""},
-          {"event mark 2 --kind pos --at 2026-03-01T08:15:00Z --length 1m --text '2 x Coffee' --text Total", 0,
-           "the id 2"},
+          {"event mark 2 --kind pos --at 2026-03-01T08:15:00Z --length 1m --text '2 x Coffee' --text Total", 0, "id 2"},
           {"event mark 1", 0, "footage"},
           {"event mark 99", 66, "no camera 99"},
           {"event mark 1 --length 2h", 65, "0 to 3600"},
@@ -181,7 +180,7 @@ TEST_F(RecordingsTest, PlansAndGroupsAreChangedAndDenied) {
           {"camera set 3 --record sometimes", 64, "--record"},
           {"camera add --name New --source test:mjpeg --type mjpeg --record always --post 1m --json", 0,
            "\"post\" : 60"},
-          {"group add Front --camera 3 --camera 4", 0, "the id 2"},
+          {"group add Front --camera 3 --camera 4", 0, "id 2"},
           {"group add Front", 65, "already"},
           {"group add Back --camera 99", 66, "no camera 99"},
           {"group set 2 --drop 3 --add 1", 0, "cameras 1 4"},

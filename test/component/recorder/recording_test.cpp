@@ -155,7 +155,7 @@ TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
         std::this_thread::sleep_for(seconds(2));  // time for a second of footage before the alarm
         store::Store store = Store();
         store::Marks marks(store);
-        const int id = marks.Add(store::MarkKind::kAlert, camera, base::WallMillis() / 1000, 1, "door open").id;
+        const int id = marks.Add(store::MarkKind::kAlert, camera, base::WallSeconds(), 1, "door open").id;
         ASSERT_TRUE(Eventually([&] {
             const auto found = marks.Find(store::MarkKind::kAlert, id);
             return found && found->state == store::MarkState::kSaved;

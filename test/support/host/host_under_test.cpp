@@ -23,7 +23,7 @@ namespace lookhaven::host {
 namespace {
 
 std::int64_t NowSeconds() {
-    return base::WallMillis() / 1000;
+    return base::WallSeconds();
 }
 
 sockaddr_un Address(const std::filesystem::path& path) {

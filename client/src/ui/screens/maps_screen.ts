@@ -99,7 +99,7 @@ export class MapsScreen extends Screen {
       this.#names.replaceChildren(...maps.map(({ id, name }) => element("option", { value: String(id) }, name)));
       this.#names.hidden = this.#tools.hidden = maps.length === 0;
       if (maps.length === 0) {
-        return this.#showMessage("There are no maps yet. An administrator adds one with lookhaven emap add.");
+        return this.#showMessage("There are no maps yet. A manager adds one with lookhaven emap add.");
       }
       if (openMap() === null) replaceRoute(maps[0]!.id);
       this.followRoute();
