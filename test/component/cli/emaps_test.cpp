@@ -83,7 +83,7 @@ TEST_F(EmapsTest, AHostIsNotRemovedWithItsDenialsUnseen) {
     annex.certificate = "-----BEGIN CERTIFICATE-----\n-----END CERTIFICATE-----\n";
     servers.Pair(annex, std::string(64, 'a'), {{.id_on_server = 1, .name = "Yard"}});
     const std::string camera = std::to_string(servers.FindCamera(1, 1)->id);
-    Play({{"server refresh", 69, "Annex failed: no connection"},
+    Play({{"server refresh", 69, "Annex failed: there is no certificate"},
           {"io add Shed --server 1 --id-on-server 4", 0, "id 2"},
           {"user deny viewer " + camera, 0, "denied"},
           {"user deny viewer --io 2", 0, "denied"},

@@ -56,14 +56,14 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
     Play({{"demo footage", 0, "8 events of the last days with 8 alerts"},
           {"demo footage", 0, "0 events"},
           {"verify", 0, "8 events with 4000 frames"},
-          {"event list --kind pos --camera 2", 0, "saved  2 x Coffee", "pending"}});
+          {"event list --kind pos --camera 2", 0, "2 x Coffee", "pending"}});
 
     // A second set-up takes nothing back, and lowers no limit under which there may be recordings.
     Play({{"mount set 1 --limit 900G", 0, "Changed"},
           {"camera set 1 --record never", 0, "Changed"},
           {"group set 1 --name Hof --drop 2", 0, "the cameras 1."},
           {"init", 0, "ready"},
-          {"demo setup", 0, "0 cameras"}});
+          {"demo setup", 0, "0 demo cameras"}});
     EXPECT_EQ(store::Mounts(store).List().size(), 1U);
     EXPECT_EQ(store::Mounts(store).Find(1)->max_bytes, std::int64_t{900} << 30);
     EXPECT_EQ(store::RecordingPlans(store).Find(1).mode, store::RecordMode::kNever);

@@ -129,7 +129,10 @@ TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
     EXPECT_GE(died_ms.size(), static_cast<std::size_t>(kills) / 2) << "it rarely got as far as recording";
     {
         Child recorder = StartRecorder();
-        ASSERT_TRUE(Eventually([&] { return Open().size() == 2 && !died_ms.contains(Open().front().path); })) << Log();
+        ASSERT_TRUE(Eventually([&] {
+            const auto open = Open();
+            return open.size() == 2 && !died_ms.contains(open.front().path);
+        })) << Log();
         recorder.Signal(SIGTERM);
         ASSERT_TRUE(recorder.Wait());
     }

@@ -79,7 +79,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const link = () => document.querySelector<HTMLAnchorElement>("a[aria-label^=Download]")!.getAttribute("href");
     expect(await page.run(link)).toBe("webapi?api=VEXO.Event&version=1&method=Download&event=90&kind=pos");
     await page.until(() => [...document.querySelectorAll(".row-text")].some((row) => row.textContent === "2 Tea <b> · Total 5"));
-    await page.until(() => document.querySelector("[data-ref=pos90] button[title$='\nReported by till']") !== null);
+    await page.until(() => document.querySelector("[data-ref=pos90] button[title$='Reported by till']") !== null);
     await client.leave(page);
   }, 40_000);
 
