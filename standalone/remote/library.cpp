@@ -97,7 +97,12 @@ class Transfer {
             RequireExpected();
         }
         if (!has_begun_ && !is_refused_by_sink_) {
-            throw NoAnswer(problem_[0] != '\0' ? problem_.data() : ::curl_easy_strerror(result));
+            if (result == CURLE_PEER_FAILED_VERIFICATION) {
+                throw NoAnswer("it shows another certificate than its own");
+            }
+            throw NoAnswer(!refusal_.empty()     ? refusal_
+                           : problem_[0] != '\0' ? problem_.data()
+                                                 : ::curl_easy_strerror(result));
         }
         return result == CURLE_OK;
     }
@@ -114,6 +119,9 @@ class Transfer {
     void RequireExpected() const {
         long status = 0;
         ::curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
+        if (status == 401 || status == 403) {
+            throw NoAnswer("it does not let this host in");
+        }
         if (status != 200) {
             throw NoAnswer("it answers with status " + std::to_string(status));
         }
@@ -145,7 +153,7 @@ class Transfer {
         try {
             return transfer.Take({bytes, size * count}) ? size * count : CURL_WRITEFUNC_ERROR;
         } catch (const std::exception& error) {
-            std::string_view(error.what()).copy(transfer.problem_.data(), transfer.problem_.size() - 1);
+            transfer.refusal_ = error.what();
             return CURL_WRITEFUNC_ERROR;
         }
     }
@@ -164,6 +172,7 @@ class Transfer {
     List connect_to_{nullptr, curl_slist_free_all};
     List headers_{nullptr, curl_slist_free_all};
     std::array<char, CURL_ERROR_SIZE> problem_{};
+    std::string refusal_;  // of the answer, by this program
     bool has_begun_ = false;
     bool is_refused_by_sink_ = false;
     std::unique_ptr<CURL, decltype(&::curl_easy_cleanup)> handle_;  // last, since it refers to the others
