@@ -39,10 +39,6 @@ class HashingPlace {
     control::Slot& slot_;
 };
 
-std::int64_t NowSeconds() {
-    return base::WallSeconds();
-}
-
 std::string CookieLine(const http::Request& request, const std::string& value) {
     return std::string("Set-Cookie: ") + SessionCookie(request) + '=' + value + "; Path=/; HttpOnly; SameSite=Strict" +
            (request.Header("HTTPS") == "on" ? "; Secure\r\n" : "\r\n");
@@ -75,7 +71,7 @@ store::VerifiedUser CheckPassword(const Call& call, const std::string& account) 
     const HashingPlace place(call);
     const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
     store::LoginThrottle throttle(call.Records());
-    if (const int wait_s = throttle.Enter(account, network, NowSeconds()); wait_s > 0) {
+    if (const int wait_s = throttle.Enter(account, network, base::WallSeconds()); wait_s > 0) {
         throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds", wait_s);
     }
     const auto user = store::Users(call.Records()).CheckPassword(account, call.Parameter("password").asString());
@@ -96,7 +92,7 @@ std::string LogIn(const Call& call) {
     store::Store& records = call.Records();
     try {
         const store::VerifiedUser user = CheckPassword(call, account);
-        const store::NewSession session = store::Sessions(records).Create(user, NowSeconds());
+        const store::NewSession session = store::Sessions(records).Create(user, base::WallSeconds());
         LogAccepted(call.context.Installation(), user.name, address);
         return SuccessAnswer(Identity(records, user.name, user.id, user.IsManager()),
                              CookieLine(call.request, session.secret));

@@ -27,7 +27,7 @@ class Relay : public remote::Sink {
     explicit Relay(const Call& call) : call_(call), output_(*call.context.output()) {}
 
     bool Begin(std::string_view content_type, std::int64_t size) override {
-        if (content_type.starts_with("multipart")) {
+        if (content_type.find("image/") != 0) {
             call_.context.NoteStream();
         }
         const std::string length = size < 0 ? "" : "Content-Length: " + std::to_string(size) + "\r\n";

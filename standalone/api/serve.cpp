@@ -52,7 +52,8 @@ Call ReadCall(http::Request& request, control::SlotTable& slots, control::Slot& 
               .slot = slot};
     call.login = FindLogin(call);
     if (!call.login && request.body.size() + request.unread_body_bytes > kMaxBodyWithoutSession) {
-        throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401, "no session, and so only a short body");
+        throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401,
+                      "log in first: without a session a body holds 4 KiB at most");
     }
     http::ReadBody(request, STDOUT_FILENO);
     AddBody(request, call.parameters);

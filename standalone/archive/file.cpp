@@ -50,7 +50,13 @@ base::FileDescriptor OpenFolder(std::filesystem::path folder, std::size_t missin
         if (steps.size() <= missing_ok && ::mkdirat(at.Get(), step, 0777) != 0 && errno != EEXIST) {
             base::ThrowErrno("cannot make the folder " + whole.string());
         }
-        at = base::FileDescriptor(::openat(at.Get(), step, O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+        base::FileDescriptor next(::openat(at.Get(), step, O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+        struct stat status {};
+        // ENOTDIR would mean that there is no such folder.
+        if (!next && errno == ENOTDIR && ::fstatat(at.Get(), step, &status, AT_SYMLINK_NOFOLLOW) == 0) {
+            errno = S_ISLNK(status.st_mode) ? ELOOP : ENOTDIR;
+        }
+        at = std::move(next);
         if (!at) {
             base::ThrowErrno("cannot open the folder " + whole.string());
         }

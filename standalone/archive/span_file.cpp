@@ -72,7 +72,11 @@ void WriteSpan(const std::filesystem::path& path, const Span& span) {
 }
 
 Span ReadSpan(const std::filesystem::path& path) {
-    return Parse(ReadFile(path, kMaxBytes), path.string());
+    const std::string text = ReadFile(path, kMaxBytes + 1);
+    if (text.size() > kMaxBytes) {
+        throw ArchiveError(path.string() + " is too long for a list of recordings");
+    }
+    return Parse(text, path.string());
 }
 
 }  // namespace lookhaven::archive

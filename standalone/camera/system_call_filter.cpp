@@ -13,6 +13,7 @@
 #include <linux/audit.h>
 #include <linux/filter.h>
 #include <linux/seccomp.h>
+#include <netinet/in.h>
 #include <sys/ioctl.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
@@ -208,7 +209,10 @@ Program MakeProgram() {
             program.Allow(number);
         }
     }
-    program.Allow(SYS_socket, {{0, kAll, {AF_INET, AF_INET6}}, {1, kSocketType, {SOCK_STREAM, SOCK_DGRAM}}});
+    // Another protocol would load a module of the kernel.
+    program.Allow(SYS_socket, {{0, kAll, {AF_INET, AF_INET6}},
+                               {1, kSocketType, {SOCK_STREAM, SOCK_DGRAM}},
+                               {2, kAll, {0, IPPROTO_TCP, IPPROTO_UDP}}});
     program.Allow(SYS_openat, {{2, O_ACCMODE | O_CREAT | O_TRUNC, {O_RDONLY}}});
     program.Allow(kMmap, {{2, PROT_EXEC, {0}}});
     program.Allow(SYS_mprotect, {{2, PROT_EXEC, {0}}});

@@ -55,10 +55,6 @@ struct Request {
     std::vector<std::string> text;
 };
 
-std::int64_t NowSeconds() {
-    return base::WallSeconds();
-}
-
 std::set<int> ChosenCameras(store::Store& store, const Request& request) {
     std::set<int> cameras(request.cameras.begin(), request.cameras.end());
     if (request.group != 0) {
@@ -77,7 +73,7 @@ std::set<int> ChosenCameras(store::Store& store, const Request& request) {
 // What event and mark filters have in common.
 template <typename Filter>
 Filter FilterOf(store::Store& store, const Request& request) {
-    const std::int64_t now = NowSeconds();
+    const std::int64_t now = base::WallSeconds();
     Filter filter;
     filter.camera_ids = ChosenCameras(store, request);
     filter.begin_s = request.from.empty() ? 0 : ParseMoment(request.from, now);
@@ -160,14 +156,14 @@ void Archive(const Console& console, const Request& request) {
 }
 
 void AddMark(const Console& console, const Request& request) {
-    const std::int64_t moment = ParseMoment(request.at, NowSeconds());
+    const std::int64_t moment = ParseMoment(request.at, base::WallSeconds());
     std::string text;
     for (const std::string& line : request.text) {
         text += (text.empty() ? "" : "\n") + line;
     }
     store::Store store = console.OpenStore();
     const Mark mark = Marks(store).Add(request.mark_kind, request.camera, moment, ParseDuration(request.length), text,
-                                       {}, NowSeconds());
+                                       {}, base::WallSeconds());
     console.Answer(ToData(mark), "Added ", mark.kind == MarkKind::kAlert ? "alert" : "POS transaction", " with id ",
                    mark.id, "; its footage from ", FormatMoment(mark.start_s), " to ", FormatMoment(mark.end_s),
                    " is saved once it is recorded.");
@@ -211,7 +207,7 @@ void CopyToFile(const std::string& file, const std::filesystem::path& recording,
 
 void Export(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const std::int64_t now = NowSeconds();
+    const std::int64_t now = base::WallSeconds();
     media::ExportOptions options;
     options.with_sound = !request.no_sound;
     if (!request.from.empty()) {

@@ -112,8 +112,8 @@ void Add(const Console& console, const Request& request) {
                            .port = offer.port,
                            .certificate = remote::CertificatesIn(offer.certificate)};
     server.id = servers.Pair(server, offer.secret, offer.cameras);
-    console.Answer(ToData(server), "Paired with ", server.name, ", the server with id ", server.id, "; it has ",
-                   offer.cameras.size(), " cameras.");
+    console.Answer(ToData(server), "Added server ", server.name, " with id ", server.id, " and ", offer.cameras.size(),
+                   " cameras.");
 }
 
 void List(const Console& console) {
@@ -149,8 +149,8 @@ void Remove(const Console& console, const Request& request) {
     const Json::Value denials = Array(servers.Denials(request.id), [](const auto& denial) { return ToData(denial); });
     const std::string text = DenialsText(denials);
     if (!denials.empty() && !request.yes) {
-        throw Failure(kDataError, "what users are denied of this server goes with it (", text,
-                      "): repeat this with --yes");
+        throw Failure(kDataError, "removing this server also removes what users are denied of it (", text,
+                      "); add --yes to confirm");
     }
     servers.Remove(request.id);
     console.Answer(Object("id", request.id, "denials", denials), "Removed server ", request.id, " with its cameras",

@@ -53,7 +53,10 @@ pid_t ReadPlayerFile(std::string_view session) {
 
 void SweepPlayerFiles() {
     std::error_code error;
-    for (const auto& entry : std::filesystem::directory_iterator(kFolder, error)) {
+    // Not a range-based loop: that one would throw where the folder cannot be read to its end.
+    for (auto at = std::filesystem::directory_iterator(kFolder, error); at != std::filesystem::directory_iterator();
+         at.increment(error)) {
+        const auto& entry = *at;
         if (!entry.path().filename().string().starts_with(kPrefix)) {
             continue;
         }

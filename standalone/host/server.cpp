@@ -184,7 +184,7 @@ void Server::StartRequest(Connection connection) {
     http::Request request = connection.parser.TakeRequest();
     if (request.unread_body_bytes > 0 && request.Header("HTTP_COOKIE").empty()) {
         return Refuse(connections_[number] = std::move(connection), LooksLikeLogIn(request) ? 413 : 401,
-                      "no session, and so only a short body");
+                      "log in first: without a session a body holds 4 KiB at most");
     }
     control::Slot* slot = slots_.Take(LooksLikeLogIn(request) ? 0 : limits_.kept_for_log_in);
     if (slot == nullptr) {

@@ -17,7 +17,9 @@ using Names = std::unique_ptr<GENERAL_NAMES, decltype(&GENERAL_NAMES_free)>;
 
 // Null at the end.
 Certificate ReadNext(const Bio& bio) {
-    return {PEM_read_bio_X509(bio.get(), nullptr, nullptr, nullptr), X509_free};
+    // An encrypted block is none; by default the library would ask the terminal for its password.
+    const auto no_password = [](char*, int, int, void*) { return -1; };
+    return {PEM_read_bio_X509(bio.get(), nullptr, no_password, nullptr), X509_free};
 }
 
 Bio Open(const std::string& pem) {

@@ -98,7 +98,7 @@ class Transfer {
         }
         if (!has_begun_ && !is_refused_by_sink_) {
             if (result == CURLE_PEER_FAILED_VERIFICATION) {
-                throw NoAnswer("it shows another certificate than its own");
+                throw NoAnswer("its certificate is not the one that it was paired with");
             }
             throw NoAnswer(!refusal_.empty()     ? refusal_
                            : problem_[0] != '\0' ? problem_.data()

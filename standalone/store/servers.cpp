@@ -45,7 +45,7 @@ constexpr std::size_t kMaxCertificateBytes = 16'384;
 constexpr std::size_t kSecretDigits = 64;
 constexpr int kMaxCameras = 1000;  // of a server: what it says of itself must not fill the store
 
-// Letters, digits, ".", "-" and, of IPv6, ":": the address becomes a part of the web server's configuration.
+// Letters, digits, ".", "-" and, of IPv6, ":": the address becomes a part of a URL, where others divide.
 bool IsAddress(std::string_view address) {
     return !address.empty() && address.size() <= kMaxAddressBytes &&
            address.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789.-:") ==

@@ -7,9 +7,8 @@
 //               statements; connection.cpp and store.cpp hold the differences.
 // Thread safety One Store per thread. Any number of processes. A Store must not be used across fork().
 // Failures      Besides what its declaration names, every function of a record class throws StoreError. Whatever it
-// throws,
-//               a change is made whole or not at all, unless its declaration says otherwise. Times are UTC seconds
-//               since the epoch and come from the caller.
+//               throws, a change is made whole or not at all, unless its declaration says otherwise. Times are UTC
+//               seconds since the epoch and come from the caller.
 // See           cameras.h, events.h, users.h and the other headers of this folder: a class for each kind of record.
 #pragma once
 

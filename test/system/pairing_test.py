@@ -164,7 +164,7 @@ class PairingTest(unittest.TestCase):
         server = json.loads(self.watcher.cli("server", "add", "Impostor", "--json", text=line))["id"]
         answer = wait_until(lambda: (a := self.relay(1, server=server)).status == 502 and a, 5, "another certificate")
         self.assertIn("recording server", answer.json["error"]["message"])
-        with self.assertRaisesRegex(AssertionError, "Impostor failed: it shows another certificate than its own"):
+        with self.assertRaisesRegex(AssertionError, "Impostor failed: its certificate is not the one"):
             self.watcher.cli("server", "refresh")
         impostor.stop()
         self.assertEqual(self.relay(1, server=server).status, 502)

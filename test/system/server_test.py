@@ -152,7 +152,7 @@ class ServerTest(unittest.TestCase):
             subprocess.run([*command.split(), "-keyout", "key.pem", "-out", "certificate.pem"], cwd=folder, check=True)
             owners = [(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")]
             server.start()
-            self.assertIn("ends within 30 days", server.said())
+            self.assertIn("expires within 30 days", server.said())
             self.assertEqual([(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")], owners)
 
     def test_client_comes_with_strict_headers(self):

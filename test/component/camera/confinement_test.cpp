@@ -109,6 +109,7 @@ TEST(Confinement, LeavesNothingButTheWayToTheCamera) {
         {"reads a process's memory", ReadsMemoryOfProcess},
         {"makes code", MakesCode},
         {"opens a local socket", [] { return OpensSocket(AF_UNIX); }},
+        {"opens a socket of a rare protocol", [] { return ::socket(AF_INET, SOCK_DGRAM, IPPROTO_UDPLITE) >= 0; }},
         {"listens", Listens},
         {"connects", Connects, true},
         {"resolves a name", ResolvesName, true},
