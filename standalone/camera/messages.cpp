@@ -8,15 +8,22 @@ namespace lookhaven::camera {
 
 namespace {
 
+void AppendBytes(std::vector<std::uint8_t>& bytes, const void* from, std::size_t size) {
+    const std::size_t at = bytes.size();
+    bytes.resize(at + size);
+    if (size > 0) {
+        std::memcpy(bytes.data() + at, from, size);
+    }
+}
+
 template <class T>
 void AppendNumber(std::vector<std::uint8_t>& bytes, const T& value) {
-    const auto* begin = reinterpret_cast<const std::uint8_t*>(&value);
-    bytes.insert(bytes.end(), begin, begin + sizeof value);
+    AppendBytes(bytes, &value, sizeof value);
 }
 
 void AppendText(std::vector<std::uint8_t>& bytes, std::string_view text) {
     AppendNumber(bytes, static_cast<std::uint32_t>(text.size()));
-    bytes.insert(bytes.end(), text.begin(), text.end());
+    AppendBytes(bytes, text.data(), text.size());
 }
 
 template <class T>
@@ -46,7 +53,7 @@ std::vector<std::uint8_t> EncodeFormat(const media::StreamFormat& format) {
     std::vector<std::uint8_t> bytes;
     AppendNumber(bytes, FormatBody{static_cast<std::int32_t>(format.codec), format.width, format.height,
                                    format.sample_rate_hz, format.channels});
-    bytes.insert(bytes.end(), format.extra_data.begin(), format.extra_data.end());
+    AppendBytes(bytes, format.extra_data.data(), format.extra_data.size());
     return bytes;
 }
 
