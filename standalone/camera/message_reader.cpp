@@ -16,6 +16,9 @@ namespace {
 // A frame may have waited in the socket while this process was stopped.
 constexpr std::int64_t kMaxAgeUs = 600'000'000;
 constexpr std::int64_t kMaxAheadUs = 10'000'000;
+// Every format of the picture costs what cameras share: a ring, a recording, the id of an event.
+constexpr std::int64_t kFormatIntervalUs = 10'000'000;
+constexpr int kMaxFormatsAtOnce = 8;
 constexpr int kMaxSampleRateHz = 192'000;
 constexpr int kMaxChannels = 8;
 
@@ -59,7 +62,7 @@ bool IsUsable(const FormatBody& format, media::Medium medium) {
 std::string Printable(std::span<const std::uint8_t> bytes) {
     std::string text(bytes.begin(), bytes.end());
     std::ranges::replace_if(
-        text, [](unsigned char byte) { return byte < ' ' || byte == 0x7F; }, '?');
+        text, [](unsigned char byte) { return byte < ' ' || byte >= 0x7F; }, '?');
     return text;
 }
 
@@ -128,6 +131,14 @@ std::optional<media::StreamFormat> MessageReader::ReadFormat(const MessageHead& 
                                {extra.begin(), extra.end()}};
 }
 
+void MessageReader::CountPictureFormat() {
+    const std::int64_t now_us = base::MonotonicMicros();
+    formats_paid_until_us_ = std::max(formats_paid_until_us_, now_us) + kFormatIntervalUs;
+    if (formats_paid_until_us_ > now_us + kMaxFormatsAtOnce * kFormatIntervalUs) {
+        Refuse("another format of the picture too often");
+    }
+}
+
 media::Packet MessageReader::ReadFrame(const MessageHead& head) const {
     const auto medium = static_cast<media::Medium>(head.medium);
     const std::optional<media::StreamFormat>& format = medium == media::Medium::kVideo ? video_ : audio_;
@@ -153,6 +164,7 @@ media::Packet MessageReader::Next() {
         if (!IsType(head, MessageType::kFormat) || static_cast<media::Medium>(head.medium) != media::Medium::kVideo) {
             Refuse("a message out of its turn");
         }
+        CountPictureFormat();
         video_ = ReadFormat(head);
     }
 }

@@ -41,6 +41,7 @@ class MessageReader {
   private:
     MessageHead ReadMessage();
     void CheckHead(const MessageHead& head) const;
+    void CountPictureFormat();
     std::optional<media::StreamFormat> ReadFormat(const MessageHead& head) const;
     media::Packet ReadFrame(const MessageHead& head) const;
 
@@ -49,6 +50,7 @@ class MessageReader {
     Input input_;
     std::vector<std::uint8_t> buffer_;  // begins with the body of the last message
     std::optional<media::StreamFormat> video_;
+    std::int64_t formats_paid_until_us_ = 0;  // each format of the picture moves it on by its interval
     std::optional<media::StreamFormat> audio_;
 };
 

@@ -72,6 +72,10 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
     const std::string video = opened + Video(Codec::kH264, 640, 480, "sps");
     const std::string sound = confined + Audio(Codec::kAac, 48'000, 2) + Message(kOpened);
     const std::string refused = "its process sent ";
+    std::string flapping = opened;
+    for (int width = 100; width < 109; ++width) {
+        flapping += Video(Codec::kMjpeg, width, 100);
+    }
     const struct {
         const char* name;
         std::string bytes;
@@ -80,7 +84,7 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
         {"picture", video + Message(kFrame, "one") + Video(Codec::kH264, 320, 240) + Message(kFrame, "two"),
          "one!H264640sps two!H264320 end"},
         {"sound", sound + Message(kFrame, "a", Medium::kAudio), "a!AAC0 end"},
-        {"its own reason", confined + Message(kFailure, "cannot open:\n\x1B[2J"), "cannot open:??[2J"},
+        {"its own reason", confined + Message(kFailure, "cannot open:\n\x1B[2J\xC2\x9B"), "cannot open:??[2J??"},
         {"cut off in a head", video.substr(0, video.size() - 30), "end"},
         {"cut off in a body", video + Message(kFrame, "one", Medium::kVideo, 0, 1), "end"},
         {"not confined", Message(kOpened), refused + "something before it confined itself"},
@@ -108,6 +112,8 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
          video + Bytes(MessageHead{4, 0, 0, 0, 1, std::numeric_limits<std::int64_t>::min()}) + "x",
          refused + "a frame of another time"},
         {"format cut off", opened + Message(kFormat, "short"), refused + "a format that is cut off"},
+        {"a new size all the time", flapping, refused + "another format of the picture too often"},
+        {"eight sizes", flapping.substr(0, flapping.size() - Video(Codec::kMjpeg, 1, 1).size()), "end"},
         {"unknown codec", opened + Video(static_cast<Codec>(2), 640, 480), refused + "an unusable format"},
         {"sound as picture", opened + Video(Codec::kAac, 640, 480), refused + "an unusable format"},
         {"no width", opened + Video(Codec::kMjpeg, 0, 480), refused + "an unusable format"},
