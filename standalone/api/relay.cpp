@@ -79,6 +79,7 @@ std::string Play(const Call& call) {
     if (!binding::MayUse(camera->id, store::CameraAccess::kAudio)) {
         request.form += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
     }
+    call.slot.pairing = store::PairingId(secret);
     call.context.CloseRecords();
     Relay relay(call);
     try {

@@ -14,6 +14,7 @@
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/http/body.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::api {
@@ -165,7 +166,10 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
         LimitAddressSpace(RLIM_INFINITY);
     };
     events.on_player = [&slots, &slot](std::int64_t key) { slots.BeginPlayer(slot, key); };
-    events.on_paired_host = [&service, &slots, &slot] { AdmitPairedHost(slots, slot, service.limits); };
+    events.on_paired_host = [&service, &slots, &slot](const std::string& secret) {
+        slot.pairing = store::PairingId(secret);
+        AdmitPairedHost(slots, slot, service.limits);
+    };
     binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);

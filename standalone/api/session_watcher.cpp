@@ -7,6 +7,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 
 namespace lookhaven::api {
@@ -17,12 +18,18 @@ constexpr std::chrono::milliseconds kPeriod{500};
 constexpr std::int64_t kPurgePeriodSeconds = 3600;
 
 void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) {
-    const std::set<std::string> running = slots.Sessions();
-    if (running.empty()) {
-        return;
+    if (const std::set<std::string> running = slots.Sessions(); !running.empty()) {
+        for (const std::string& ended : store::Sessions(records).EndedAmong({running.begin(), running.end()}, now_s)) {
+            slots.EndSession(ended);
+        }
     }
-    for (const std::string& ended : store::Sessions(records).EndedAmong({running.begin(), running.end()}, now_s)) {
-        slots.EndSession(ended);
+    if (const std::set<std::uint64_t> running = slots.Pairings(); !running.empty()) {
+        const std::set<std::uint64_t> valid = store::RecordingServers(records).Pairings();
+        for (const std::uint64_t pairing : running) {
+            if (!valid.contains(pairing)) {
+                slots.EndPairing(pairing);
+            }
+        }
     }
 }
 

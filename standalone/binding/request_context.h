@@ -31,7 +31,7 @@ struct RequestEvents {
     // The process plays recordings, reachable under the client's stream key; its player file is written.
     std::function<void(std::int64_t key)> on_player = [](std::int64_t) {};
     // The caller has proved to be a paired host. May throw, which ends the request.
-    std::function<void()> on_paired_host = [] {};
+    std::function<void(const std::string& secret)> on_paired_host = [](const std::string&) {};
 };
 
 // The rights that a request's "privData" leaves to its caller, whoever that is.
@@ -90,7 +90,7 @@ class LH_PLATFORM_API RequestContext {
     // The answer is a stream, which may run for as long as the client likes.
     void NoteStream();
     void NotePlayer(std::int64_t key) { events_.on_player(key); }
-    void NotePairedHost() { events_.on_paired_host(); }
+    void NotePairedHost(const std::string& secret) { events_.on_paired_host(secret); }
     // The answer is a picture, alone or in a stream.
     void NotePicture() { wants_picture_ = true; }
     bool WantsPicture() const { return !is_hidden_ && (wants_picture_ || is_stream_); }

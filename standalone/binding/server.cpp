@@ -109,21 +109,23 @@ std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabl
 
 // A caller with a valid pair token is the paired host from here on, whatever session came along.
 bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
-    const bool is_paired_host = OrFailure("IsAuthPairMatch", false, [&] {
+    const std::string shared = OrFailure("IsAuthPairMatch", std::string(), [&] {
         const std::int64_t now = UtcSeconds();
-        bool matches = false;
+        std::string found;
         for (const std::string& secret : Servers().SecretsOfPairedHosts()) {
-            matches |= store::PairTokenMatches(cookie, timestamp, secret, now);
+            if (store::PairTokenMatches(cookie, timestamp, secret, now)) {
+                found = secret;
+            }
         }
-        if (matches) {
+        if (!found.empty()) {
             RequestContext::Current().SetCaller(PAIR_AUTH_UID);
         }
-        return matches;
+        return found;
     });
-    if (is_paired_host) {
-        RequestContext::Current().NotePairedHost();
+    if (!shared.empty()) {
+        RequestContext::Current().NotePairedHost(shared);
     }
-    return is_paired_host;
+    return !shared.empty();
 }
 
 SlaveHxAuthentication::SlaveHxAuthentication() = default;

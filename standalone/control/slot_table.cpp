@@ -58,6 +58,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->has_session = false;
     slot->pid = 0;
     slot->user = 0;
+    slot->pairing = 0;
     slot->work = Work::kNone;
     slot->player.started_us = 0;
     slot->player.is_excess = false;
@@ -125,15 +126,33 @@ std::set<std::string> SlotTable::Sessions() const {
     return sessions;
 }
 
-// The serial is read before the session: of a slot that is taken anew in between, the old one is marked.
-void SlotTable::EndSession(std::string_view handle) {
+std::set<std::uint64_t> SlotTable::Pairings() const {
+    std::set<std::uint64_t> pairings;
+    for (const Slot& slot : slots_) {
+        if (const std::uint64_t pairing = slot.pairing; pairing != 0 && slot.serial != 0 && !slot.MustEnd()) {
+            pairings.insert(pairing);
+        }
+    }
+    return pairings;
+}
+
+// The serial is read before the rest: of a slot that is taken anew in between, the old one is marked.
+void SlotTable::EndAll(const std::function<bool(const Slot&)>& is_meant) {
     for (Slot& slot : slots_) {
         const SlotUse use{&slot, slot.serial};
-        if (use.serial != 0 && SessionOf(slot) == handle) {
+        if (use.serial != 0 && is_meant(slot)) {
             MarkEnded(use);
         }
     }
     Wake();
+}
+
+void SlotTable::EndSession(std::string_view handle) {
+    EndAll([handle](const Slot& slot) { return SessionOf(slot) == handle; });
+}
+
+void SlotTable::EndPairing(std::uint64_t pairing) {
+    EndAll([pairing](const Slot& slot) { return slot.pairing == pairing; });
 }
 
 void SlotTable::End(const SlotUse& use) {

@@ -68,7 +68,8 @@ struct Slot {
     std::atomic<bool> is_stream;
     std::atomic<bool> has_session;
     std::atomic<pid_t> pid;
-    std::atomic<int> user;  // whose request was admitted; 0: none yet
+    std::atomic<int> user;               // whose request was admitted; 0: none yet
+    std::atomic<std::uint64_t> pairing;  // with the host that sent the request, or that it asks; 0: none
     std::atomic<Work> work;
     std::array<char, 64> session;
     Player player;
@@ -114,6 +115,9 @@ class SlotTable {
     std::set<std::string> Sessions() const;
     // Marks all requests of the session as to end and wakes the host.
     void EndSession(std::string_view handle);
+    // The same of pairings with other hosts.
+    std::set<std::uint64_t> Pairings() const;
+    void EndPairing(std::uint64_t pairing);
 
     // For a request process: from now on it is a player, and older players of the session may have to end.
     void BeginPlayer(Slot& slot, std::int64_t key);
@@ -146,6 +150,7 @@ class SlotTable {
     static std::uint64_t PackPause(std::uint64_t serial, const Pause& pause);
     static Pause UnpackPause(std::uint64_t word);
 
+    void EndAll(const std::function<bool(const Slot&)>& is_meant);
     // How many other requests there are that count.
     std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;
 

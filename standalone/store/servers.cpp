@@ -147,6 +147,10 @@ void UpdateRow(soci::session& sql, const RecordingServer& server, const std::opt
 
 }  // namespace
 
+std::uint64_t PairingId(const std::string& secret) {
+    return std::max<std::uint64_t>(std::hash<std::string>()(secret), 1);
+}
+
 int RecordingServers::Add(const RecordingServer& server, const std::string& secret) {
     RequireSecret(secret);
     return connection_.Write([&](soci::session& sql) {
@@ -228,6 +232,15 @@ std::string RecordingServers::FindSecret(int id) {
 std::vector<std::string> RecordingServers::SecretsOfPairedHosts() {
     return connection_.FetchAll<std::string>("select secret from servers where enabled = 1 and address = ''"
                                              " order by id");
+}
+
+std::set<std::uint64_t> RecordingServers::Pairings() {
+    std::set<std::uint64_t> pairings;
+    for (const std::string& secret :
+         connection_.FetchAll<std::string>("select secret from servers where enabled = 1")) {
+        pairings.insert(PairingId(secret));
+    }
+    return pairings;
 }
 
 int RecordingServers::PutCamera(const RemoteCamera& camera) {

@@ -3,7 +3,9 @@
 // Hosts that this one is paired with, and the cameras of theirs that it knows.
 #pragma once
 
+#include <cstdint>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -41,6 +43,10 @@ struct ServerDenial {
     int id = 0;                                 // on this host
 };
 
+// Tells pairings apart by the secret that both hosts share, without telling it; never 0. Means nothing outside this run of
+// the program.
+std::uint64_t PairingId(const std::string& secret);
+
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
 //               (2) A secret comes out of SecretsOfPairedHosts and FindSecret alone, never with the record.
 class RecordingServers {
@@ -71,6 +77,8 @@ class RecordingServers {
     // Of the enabled servers without an address: hosts that connect to this one. The secret of a server that this host
     // connects to admits nobody here.
     std::vector<std::string> SecretsOfPairedHosts();
+    // Of all enabled servers, whichever side connects.
+    std::set<std::uint64_t> Pairings();
 
     // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
     // Returns the id. Throws InvalidRecord, or NotFound for an unknown server.

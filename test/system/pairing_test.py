@@ -219,7 +219,10 @@ class PairingTest(unittest.TestCase):
         self.watcher.cli("server", "refresh")  # unless the minute's own was faster
         self.assertEqual(json.loads(self.watcher.cli("server", "refresh", "--json"))[0]["new"], 0)
         self.assertEqual(set(known()) - set(before), {later})
-        line = self.owner.cli("server", "pair", "Watcher", "--address", "localhost", "--port", str(self.owner.tls_port))
+        with self.relayed_parts(1) as parts:
+            parts.next()
+            line = self.owner.cli("server", "pair", "Watcher", "--address", "localhost", "--port", str(self.owner.tls_port))
+            self.assertRaises(EOFError, lambda: [parts.next() for _ in range(1000)])
         with self.assertRaisesRegex(AssertionError, "does not let this host in"):
             self.watcher.cli("server", "refresh")
         before = known()

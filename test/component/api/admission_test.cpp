@@ -130,6 +130,11 @@ TEST(Peers, AreOneUserTogether) {
     }
     EXPECT_EQ(HostUnderTest::ReadAnswer(open(std::string(64, 'b'))).status, 503);
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
+    peer = *store::RecordingServers(records).Find(1);
+    peer.enabled = false;
+    store::RecordingServers(records).Update(peer);
+    EXPECT_TRUE(host::Eventually(std::chrono::seconds(2), [&] { return host.RequestProcesses() == 1; }))
+        << "one of two goes on: its pairing does";
 }
 
 TEST_F(Admission, AStoreThatCannotBeWrittenStillServesWhoIsLoggedIn) {
