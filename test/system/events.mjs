@@ -8,14 +8,19 @@ const start = Number(process.env.EVENT_START);
 const middle = Number(process.env.EVENT_MIDDLE);
 
 await visit(async (page, complaints) => {
-  const settled = (state) => page.locator(`.stage-picture[data-state="${state}"]`).first().waitFor({ timeout: 15_000 });
+  /** Waits for one of the states; the page shows what a click changed with the next picture of the screen at the latest. */
+  const settled = async (...states) => {
+    await page.evaluate(() => new Promise((resolve) => requestAnimationFrame(() => requestAnimationFrame(resolve))));
+    await page.locator(states.map((state) => `.stage-picture:first-of-type[data-state="${state}"]`).join()).waitFor({ timeout: 15_000 });
+  };
   const text = (selector) => page.locator(selector).first().textContent();
   /** What the canvas shows, the frame that is told, and the second of the playhead. */
-  const shown = async () => ({
-    picture: await page.evaluate(() => document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1]),
-    told: Number(/^frame (\d+)/.exec(await text(".transport-frame"))[1]) - 1,
-    time: await text(".transport-time"),
-  });
+  const shown = () =>
+    page.evaluate(() => ({
+      picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
+      told: Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)[1]) - 1,
+      time: document.querySelector(".transport-time").textContent,
+    }));
 
   await page.goto(`${address}#events`);
   await logIn(page);
@@ -26,7 +31,7 @@ await visit(async (page, complaints) => {
   /** The time under a point of the timeline, by a click on it. */
   const timeAt = async (x) => {
     await page.mouse.click(box.x + x, y);
-    await page.waitForTimeout(400);
+    await settled("playing", "empty");
     const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
     return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time}`) / 1000;
   };
@@ -45,7 +50,6 @@ await visit(async (page, complaints) => {
     for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
   }
   await timeAt(x);
-  await settled("playing");
   await page.keyboard.press(" ");
   await settled("paused");
   await page.screenshot({ path: `${folder}/events.png` });
@@ -59,7 +63,6 @@ await visit(async (page, complaints) => {
     await page.keyboard.press(key);
     await page.waitForFunction((wanted) => document.querySelector(".transport-frame").textContent.startsWith(`frame ${wanted} `), frame + 1);
     await settled("paused");
-    await page.waitForTimeout(200);
   };
   await next("ArrowRight", before.told + 1);
   await report("one on", await shown());
@@ -68,7 +71,6 @@ await visit(async (page, complaints) => {
   await report("two back", await shown());
 
   await timeAt(x + Math.min(3 / scale, box.width - x - 20));
-  await settled("playing");
   await page.keyboard.press(" ");
   await settled("paused");
   await report("jumped", { ...(await shown()), complaints });

@@ -46,6 +46,8 @@ export class Player {
   #key = 0;
   #lastFrameMs = 0;
   #run = new AbortController();
+  /** Where playing begins, until its first frame is shown. */
+  #opening: Start | null = null;
   /** While paused: the frame requested last, until it is shown; and the request that is under way. */
   #wanted: Start | null = null;
   #fetching: AbortSignal | null = null;
@@ -90,13 +92,14 @@ export class Player {
 
   play(): void {
     if (!this.#footage || this.#state.kind === "playing") return;
-    void this.#play({ index: this.#state.kind === "ended" ? 0 : this.#index });
+    void this.#play(this.#wanted ?? this.#opening ?? { index: this.#state.kind === "ended" ? 0 : this.#index });
   }
 
   pause(): void {
     if (this.#state.kind !== "playing" && this.#state.kind !== "opening") return;
-    // Before the first frame there is no picture yet that could stay.
-    if (this.#state.kind === "opening") return this.#showStill({ index: this.#index });
+    // Before the first frame there is no picture yet that could stay. A still that is being fetched is as good as a pause.
+    if (this.#opening) return this.#showStill(this.#opening);
+    if (this.#fetching) return;
     this.#begin();
     this.#become({ kind: "paused" });
   }
@@ -131,7 +134,7 @@ export class Player {
   #begin(): AbortSignal {
     this.#run.abort();
     this.#run = new AbortController();
-    this.#wanted = this.#fetching = null;
+    this.#opening = this.#wanted = this.#fetching = null;
     return this.#run.signal;
   }
 
@@ -196,6 +199,7 @@ export class Player {
 
   async #play(start: Start): Promise<void> {
     const signal = this.#begin();
+    this.#opening = start;
     this.#become({ kind: "opening" });
     let next = start;
     if ("timeMs" in start) {
@@ -240,6 +244,7 @@ export class Player {
     await this.show(frame, signal).catch(() => undefined);
     if (signal.aborted) return;
     this.#lastFrameMs = performance.now();
+    this.#opening = null;
     this.#index = frame.index;
     this.#changed();
   }

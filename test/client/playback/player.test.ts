@@ -72,6 +72,19 @@ describe("a player", () => {
     expect([drawn, player.index]).toEqual([2, 2]);
   });
 
+  test("a pause, and playing on, while a time is being looked for goes to that time", async () => {
+    player.open(footage(7), 5_000, true);
+    player.pause();
+    await until("paused");
+    expect(player.index).toBe(50);
+    player.open(footage(7), 2_000, false);
+    player.pause();
+    player.play();
+    await until("playing");
+    expect(player.index).toBeLessThan(30);
+    player.close();
+  });
+
   test("a mark is found by frame, since the server knows no times in it", async () => {
     player.open(footage(8, { kind: "alert" }), 5_000, false);
     await until("paused");
