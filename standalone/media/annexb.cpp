@@ -13,10 +13,14 @@ constexpr std::array<std::uint8_t, 4> kStartCode{0, 0, 0, 1};
 constexpr std::size_t kMaxSets = 512;
 constexpr std::size_t kMaxSetBytes = 65536;
 
+bool IsStartCode(std::span<const std::uint8_t> bytes) {
+    return bytes.size() >= 3 && bytes[0] == 0 && bytes[1] == 0 && bytes[2] == 1;
+}
+
 // The position just after the next start code, or the frame's size.
 std::size_t AfterStartCode(std::span<const std::uint8_t> frame, std::size_t from) {
     for (std::size_t i = from; i + 3 <= frame.size(); ++i) {
-        if (frame[i] == 0 && frame[i + 1] == 0 && frame[i + 2] == 1) {
+        if (IsStartCode(frame.subspan(i))) {
             return i + 3;
         }
     }
@@ -105,11 +109,13 @@ std::vector<std::uint8_t> ParameterSets::SetsOf(std::span<const std::uint8_t> fr
         }
         const std::size_t next = AfterStartCode(frame, begin);
         if (unit != Unit::kOther) {
-            std::size_t end = next == frame.size() ? next : next - 3;
-            while (end > begin && frame[end - 1] == 0) {
-                --end;  // the extra zeros of a longer start code belong to no unit
+            auto set = frame.subspan(begin, next - begin);
+            if (set.size() >= 3 && IsStartCode(set.last(3))) {
+                set = set.first(set.size() - 3);
             }
-            const auto set = frame.subspan(begin, end - begin);
+            while (!set.empty() && set.back() == 0) {
+                set = set.first(set.size() - 1);  // the extra zeros of a longer start code belong to no unit
+            }
             if (++count > kMaxSets || sets.size() + set.size() > kMaxSetBytes) {
                 return {};
             }
