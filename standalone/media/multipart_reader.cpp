@@ -160,9 +160,9 @@ bool MultipartReader::ReadToBoundary() {
             }
             break;
         }
-        if (part_.size() > max_part_bytes_ + tail) {
-            // Too large: keep only what may be the beginning of a boundary.
-            part_.erase(part_.begin(), part_.end() - static_cast<std::ptrdiff_t>(tail));
+        if (part_.size() > max_part_bytes_ + 1 + tail) {
+            // Too large: keep only what may be the beginning of a boundary, with the carriage return before it.
+            part_.erase(part_.begin(), part_.end() - static_cast<std::ptrdiff_t>(tail + 1));
             fits = false;
         }
     }
@@ -170,7 +170,7 @@ bool MultipartReader::ReadToBoundary() {
         throw SourceError("the camera ended the stream");
     }
     at_boundary_ = true;
-    return fits && !part_.empty();
+    return fits && !part_.empty() && part_.size() <= max_part_bytes_;
 }
 
 }  // namespace lookhaven::media
