@@ -1,15 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Event search: which days and seconds are marked, the order of calls, which requests are rejected.
+// Event search: which days are marked, and what both searches have in common: rejected requests, groups, the trace.
 #include <climits>
-#include <sstream>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "player/multiplayer/multiplayer.h"
 #include "player/multiplayer/time_zone_keys.h"
-#include "test/support/platform/record.h"
+#include "test/unit/scripted_search.h"
 
 using namespace lookhaven::test;
 using testing::ElementsAre;
@@ -17,25 +15,6 @@ using testing::ElementsAre;
 namespace {
 
 constexpr int kDay = 86400;
-
-// A search of cameras 2 and 4 by a user who may not access cameras 9 and 12 nor group 6.
-struct Search : ScriptedPlatform {
-    explicit Search(const char* searched) {
-        method = searched;
-        log_cfg.m_CategLevel[68] = 1;
-        denied_cameras = {12, 9};
-        denied_groups = {6};
-        for (const int id : {2, 4}) {
-            mount_cameras[id] = MakeCamera(id, CAM_VIDEO_H265);
-        }
-        group_cameras[12] = MakeCamera(12, CAM_VIDEO_MJPEG);
-        params = {{"start", 1000000}, {"from", 1000000}, {"to", 1000060}, {"cameralists", "2"}};
-    }
-    void Run() { MultiPlayerHandler(Request(), Response()).HandleProcess(); }
-};
-
-const Calls kProfile = {"GetLoginUID()", "PrivProfileGetByUid(7)"};
-const Calls kMount = {"GetInaPrivPerCamGrpIdSet(2)", "GetCamMountMap(3,9,12,1)"};
 
 TEST(SearchAvaiDate, AsksInOrder) {
     Search search("SearchAvaiDate");
@@ -156,6 +135,8 @@ TEST(EventSearch, Rejects) {
         {"so long that it wraps", from_to(INT_MIN, INT_MAX), span, 401, profile},
         {"the last second", from_to(INT_MAX - 1, INT_MAX), "", 0, "FillRecLogMap"},
         {"over the wrap of time", from_to(INT_MAX, INT_MIN), "", 0, "FillRecLogMap"},
+        {"no camera", Params({{"cameralists", ""}}), "", 0, "String2IntList"},
+        {"cameras that are not there", Params({{"cameralists", "7,8"}}), "", 0, "String2IntList"},
     };
     const auto check = [](const char* method, const RejectedRow& row) {
         SCOPED_TRACE(std::string(method) + " " + row.name);
@@ -171,9 +152,8 @@ TEST(EventSearch, Rejects) {
         }
         const auto calls = search.calls;
         EXPECT_THAT(calls.at(calls.size() - 2 - logs.size()), testing::StartsWith(row.last));
-        EXPECT_THAT(calls.back(), row.code == 0 ? testing::StartsWith("SetSuccess(")
-                                                : testing::StartsWith("SetError(" + std::to_string(row.code) +
-                                                                      ",{\"param1\":\"\",\"param2\":\"\"})"));
+        const std::string error = "SetError(" + std::to_string(row.code) + ",{\"param1\":\"\",\"param2\":\"\"})";
+        EXPECT_THAT(calls.back(), testing::StartsWith(row.code == 0 ? "SetSuccess({\"camera\":[" : error));
     };
     for (const auto& row : both) {
         check("SearchAvaiDate", row);
@@ -205,122 +185,6 @@ TEST(EventSearch, TracesTheRequestAtLevel5) {
         EXPECT_EQ(search.CallsOf("log"),
                   (level == 4 ? Calls{} : Calls{"log player/5 Method [Other], Params [{\n\t\"a\" : 1\n}\n]\n"}));
         EXPECT_EQ(search.calls.size(), level == 4 ? 1U : 3U) << "nothing else, and nothing read in vain";
-    }
-}
-
-TEST(EnumEvent, AsksInOrder) {
-    Search search("EnumEvent");
-    search.params["mount_id"] = 3;
-    search.params["reason"] = 259;
-    search.Run();
-    EXPECT_EQ(search.calls,
-              (Calls({"GetAPIMethod()", "GetParam(mount_id,0)", "GetParam(camGrpId,0)", "GetParam(from,0)",
-                      "GetParam(to,0)", "GetParam(interval,5)", "GetParam(recording,false)", "GetParam(reason,0)",
-                      "GetParam(cameralists,\"\")"}) +
-               kProfile + Calls{"GetInaCamIdSet(2,1)", "GetInaCamIdSet(8,1)"} + kMount +
-               Calls{"String2IntList(2,,)", "EventListGetAll(3,-1,1000000,1000060,2,3,2,6,camera_id)",
-                     "ReadRecLog(/cam2,1000000,60)", "FillRecLogMap(log," + std::string(60, '.') + ",5)",
-                     "SetSuccess({\"camera\":[{\"camera_id\":2,\"event\":[],\"event_map\":\"map\",\"total\":0}]})"}));
-}
-
-TEST(EnumEvent, DescribesEachEvent) {
-    for (const int rec_log_result : {1, -1}) {
-        Search search("EnumEvent");
-        Event event = MakeEvent(31, 1000001, 1000002, 7);
-        event.m_FrameCount = 33, event.m_VdoType = 3, event.m_ImgW = 640, event.m_ImgH = 360, event.m_CamId = 8;
-        event.m_blRecording = true, event.m_Size = 1572864, event.m_Path = "2/x.mkv";
-        search.found_events = {event, event};
-        Event& other = search.found_events.back();
-        other.m_CamId = 2, other.m_blArchived = true, other.m_blRecording = false, other.m_Size = 1ULL << 43;
-        search.muted_cameras = {4};
-        search.mount_cameras[0] = MakeCamera(0, 1);
-        search.mount_cameras[1] = MakeCamera(1, CAM_VIDEO_MJPEG);
-        search.rec_log_result = rec_log_result;
-        Params({{"recording", true}, {"cameralists", "4,1,9,0,2,2"}})(search);
-        search.Run();
-        Json::Value first, expected;
-        std::istringstream(
-            R"({"archived":false,"event_size":1.5,"fisheye_origin_view":true,"frameCount":33,"frame_count":33,"id":31,
-                "id_on_RecServer":1031,"img_height":360,"img_width":640,"is_recording":true,"name":"2/x.mkv",
-                "record_type":7,"start":1000001,"startTime":1000001,"stop":1000002,"stopTime":1000002,"video_type":3})") >>
-            first;
-        Json::Value second = first;
-        second["archived"] = true;
-        second["fisheye_origin_view"] = second["is_recording"] = false;
-        second["event_size"] = 8388608.0;
-        Calls queries;
-        for (const int id : {4, 1, 2, 2}) {
-            first["audio_format"] = second["audio_format"] = id == 4 ? "" : "AAC";
-            Json::Value& entry = expected["camera"].append(Json::Value());
-            entry["camera_id"] = id;
-            entry["event"].append(first);
-            entry["event"].append(second);
-            entry["total"] = 2U;
-            queries.push_back("EventListGetAll(0,-1,1000000,1000060," + std::to_string(id) + ",0,0," +
-                              (id == 1 ? "1" : "6") + ",camera_id)");
-        }
-        EXPECT_EQ(search.calls.back(), "SetSuccess(" + Text(expected) + ")");
-        EXPECT_EQ(search.CallsOf("EventListGetAll"), queries);
-    }
-}
-
-TEST(EnumEvent, OfNoCameraIsAnEmptyList) {
-    for (const char* list : {"", "7,8"}) {
-        Search search("EnumEvent");
-        search.params["cameralists"] = list;
-        search.Run();
-        EXPECT_EQ(search.calls.back(), "SetSuccess({\"camera\":[]})");
-    }
-}
-
-struct CoverageRow {
-    const char* name;
-    int from, to;
-    std::vector<Event> events;
-    const char* seconds;
-};
-
-TEST(EnumEvent, MarksCoverage) {
-    const CoverageRow rows[] = {
-        {"inside", 100, 110, {MakeEvent(1, 102, 105)}, "..XXX....."},
-        {"to the end", 100, 110, {MakeEvent(1, 107, 200)}, ".......XXX"},
-        {"its whole length from the begin on", 100, 110, {MakeEvent(1, 95, 102)}, "XXXXXXX..."},
-        {"began long before", 100, 110, {MakeEvent(1, 10, 102)}, "XXXXXXXXXX"},
-        {"after the span", 100, 110, {MakeEvent(1, 110, 120)}, ".........."},
-        {"ended before it began", 100, 110, {MakeEvent(1, 105, 104)}, ".........."},
-        {"kinds that mark",
-         100,
-         110,
-         {MakeEvent(1, 100, 101, 1), MakeEvent(1, 101, 102, 2), MakeEvent(1, 102, 103, 5), MakeEvent(1, 103, 104, 6),
-          MakeEvent(1, 104, 105, 10), MakeEvent(1, 105, 106, 257)},
-         "XXXXXX...."},
-        {"kinds that do not",
-         100,
-         110,
-         {MakeEvent(1, 100, 101, 0), MakeEvent(1, 101, 102, 7), MakeEvent(1, 102, 103, 9), MakeEvent(1, 103, 104, 11),
-          MakeEvent(1, 104, 105, INT_MIN), MakeEvent(1, 105, 106, -1), MakeEvent(1, 106, 107, 8),
-          MakeEvent(1, 107, 108, 266)},
-         ".........."},
-        {"from the lowest to the highest time", 100, 110, {MakeEvent(1, INT_MIN, INT_MAX)}, ".........."},
-        {"over the wrap of time", INT_MAX - 4, INT_MAX, {MakeEvent(1, INT_MAX - 2, INT_MIN)}, "..XX"},
-        {"half the time away", INT_MIN, INT_MIN + 4, {MakeEvent(1, INT_MAX, INT_MIN + 1)}, "XX.."},
-    };
-    for (const auto& row : rows) {
-        SCOPED_TRACE(row.name);
-        Search search("EnumEvent");
-        Params({{"from", row.from}, {"to", row.to}, {"interval", -3}, {"cameralists", "2,4"}})(search);
-        search.found_events = {row.events.begin(), row.events.end()};
-        search.on_call = [&](const std::string& call) {
-            if (call.rfind("EventListGetAll", 0) == 0 && call.find(",4,") != std::string::npos) {
-                search.found_events.clear();
-            }
-        };
-        search.Run();
-        EXPECT_THAT(
-            search.CallsOf("FillRecLogMap"),
-            ElementsAre("FillRecLogMap(log," + std::string(row.seconds) + ",-3)",
-                        "FillRecLogMap(log," + std::string(static_cast<std::size_t>(row.to - row.from), '.') + ",-3)"))
-            << "and nothing stays for the next camera";
     }
 }
 

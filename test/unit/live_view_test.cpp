@@ -34,6 +34,9 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
     const Change snapshot = Params({{"snapshot", 1}});
     const std::string head = "Content-type: image/jpeg\r\nContent-length: ";
     const Calls own_profile = kCamera + Calls{"GetLiveProfile()", "GetUiStreamNo(1)"};
+    const Calls no_sound = own_profile + kStream +
+                           Calls{"LiveAdoStreamFifoAt(5,51)", "log Cam[5]: Failed to attach live audio stream [51].\n"};
+    const Calls not_mjpeg = kSnapshot + Calls{"log The video codec of cam[5] NOT mjpg.\n"};
     const RequestRow rows[] = {
         {"another method", [](auto& p) { p.method = "Stop"; }, 0, {"GetAPIMethod()"}},
         {"not admitted, nor a camera", [](auto& p) { p.is_authorized = false, p.params.clear(); }, 105, {}},
@@ -53,8 +56,8 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
          [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_stream = p.has_audio_stream = false; }, 400,
          own_profile + kStream + Calls{"log Cam[5]: Failed to attach live stream [51].\n"}},
         {"another codec", [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_audio_stream = false; }, 400,
-         own_profile + kStream +
-             Calls{"LiveAdoStreamFifoAt(5,51)", "log Cam[5]: Failed to attach live audio stream [51].\n"}},
+         no_sound},
+        {"unknown codec", [](auto& p) { p.cameras[5].m_VideoType = 0, p.has_audio_stream = false; }, 400, no_sound},
         {"no stream", [](auto& p) { p.has_stream = false, p.params["snapshot"] = 2; }, 400,
          own_profile + kStream + Calls{"log Cam[5]: Failed to attach live stream [51].\n"}},
         {"a given profile", [](auto& p) { p.has_stream = false, p.params["profileType"] = 0; }, 400,
@@ -75,8 +78,8 @@ TEST(LiveViewRequest, ReadsInOrderAndPicksTheOutput) {
         {"isFromPlugin 2", [](auto& p) { p.params["isFromPlugin"] = 2; }, 0,
          own_profile + kStream + kStart + Empty(10001) + kClose},
         {"snapshot of another codec, nor a stream",
-         snapshot + [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_stream = false; }, 400,
-         kSnapshot + Calls{"log The video codec of cam[5] NOT mjpg.\n"}},
+         snapshot + [](auto& p) { p.cameras[5].m_VideoType = CAM_VIDEO_H264, p.has_stream = false; }, 400, not_mjpeg},
+        {"snapshot of an unknown codec", snapshot + [](auto& p) { p.cameras[5].m_VideoType = 0; }, 400, not_mjpeg},
         {"snapshot of no stream", snapshot + [](auto& p) { p.has_stream = false; }, 400,
          kAttach + Calls{"log Failed to attach cam[5] live stream buf\n"}},
         {"snapshot of an empty stream", snapshot, 400, kAttach + Calls{"ReadLatest()"}},

@@ -79,7 +79,7 @@ TEST(LoadCamera, Answers) {
 struct FailureRow {
     const char* name;
     Change script;
-    std::vector<std::string> logs;  // source:line function: text
+    std::string logs;  // source:line function: text, of each
     bool answered;
 };
 
@@ -92,35 +92,26 @@ TEST(LoadCamera, FailuresAreLoggedAndOnlyABrokenFunctorIsForgiven) {
         "544 operator(): [Sound] Error: Some Functor is not registered properly. Check the template argument list and "
         "Function ID.\n";
     const FailureRow rows[] = {
-        {"unknown user, and no port",
-         [](auto& p) { p.profile_id = p.login_port = 0; },
-         {"liveview:24 SendCamerasData: Incorrect priv profile of Uid[7].\n", failed},
-         false},
-        {"no port, nor capabilities",
-         [](auto& p) { p.login_port = 0, p.cap_failures = {2}; },
-         {no_port, failed},
-         false},
-        {"negative port", [](auto& p) { p.login_port = -1; }, {no_port, failed}, false},
-        {"capability of one camera",
-         [](auto& p) { p.cap_failures = {4}; },
-         {"liveview:57 SendCamerasData: Failed to get camera cap.\n", failed},
-         false},
-        {"capability of a disabled camera", [](auto& p) { p.cap_failures = {3}; }, {}, true},
-        {"functor without target",
-         [](auto& p) { p.sound[4] = Sound::kNoTarget; },
-         {functor + "541 operator(): [Sound] Error: Failed to run functor with DPObjectBase as NULL.\n"},
-         true},
-        {"no functor", [](auto& p) { p.sound[4] = Sound::kNoFunctor; }, {not_registered}, true},
-        {"functor of another type", [](auto& p) { p.sound[4] = Sound::kWrongType; }, {not_registered}, true},
+        {"unknown user, and no port", [](auto& p) { p.profile_id = p.login_port = 0; },
+         "liveview:24 SendCamerasData: Incorrect priv profile of Uid[7].\n" + failed, false},
+        {"no port, nor capabilities", [](auto& p) { p.login_port = 0, p.cap_failures = {2}; }, no_port + failed, false},
+        {"negative port", [](auto& p) { p.login_port = -1; }, no_port + failed, false},
+        {"capability of one camera", [](auto& p) { p.cap_failures = {4}; },
+         "liveview:57 SendCamerasData: Failed to get camera cap.\n" + failed, false},
+        {"capability of a disabled camera", [](auto& p) { p.cap_failures = {3}; }, "", true},
+        {"functor without target", [](auto& p) { p.sound[4] = Sound::kNoTarget; },
+         functor + "541 operator(): [Sound] Error: Failed to run functor with DPObjectBase as NULL.\n", true},
+        {"no functor", [](auto& p) { p.sound[4] = Sound::kNoFunctor; }, not_registered, true},
+        {"functor of another type", [](auto& p) { p.sound[4] = Sound::kWrongType; }, not_registered, true},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         ScriptedPlatform platform;
         Load(platform, row.script);
-        std::vector<std::string> logs;
+        std::string logs;
         for (const auto& log : platform.logs) {
             EXPECT_EQ(log.categ + log.level, "nullnull");
-            logs.push_back(log.file + ":" + std::to_string(log.line) + " " + log.func + ": " + log.text);
+            logs += log.file + ":" + std::to_string(log.line) + " " + log.func + ": " + log.text;
         }
         EXPECT_EQ(logs, row.logs);
         EXPECT_EQ(platform.CallsFrom("Set").size(), row.answered ? 1U : 0U);

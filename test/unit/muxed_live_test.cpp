@@ -71,52 +71,41 @@ const Change kBoth = Begins(Key(40, "KK"), {Delta(41, "ddd")}) + WithSound({Delt
 const LoopRow kRows[] = {
     {"begins with the newest key frame and forwards both media without a rest",
      Begins(Key(40, "K"), {Delta(41, "d"), {}, Delta(0, "e")}) + WithSound({Delta(8, "s"), Delta(9, "t")}),
-     {},
      Started("K") + Video(40, WriteDelta("d")) + Audio(10001, WriteSound("s")) + Video(41, {}, "null") +
          Audio(8, WriteSound("t")) + Video(41, WriteDelta("e")) + Audio(9, {}, "null") + NothingNew(0, 9) + kRest +
          Exit("1", "0")},
     {"without one waits, dropping sound and frames that need an earlier one, whose numbers it takes",
      Pictures({Delta(3, "d"), Key(4, "K")}) + WithSound({Delta(1, "s"), Delta(2, "t")}),
-     {},
      kNoStart + Video(10001, {}) + Audio(10001, {}) + kRest + Video(3, kUpdate + WriteKey("K")) +
          Audio(1, WriteSound("t")) + NothingNew(4, 2) + kRest + Exit("1", "0")},
-    {"an empty start frame is none",
-     Begins(Key(40, ""), {Key(41, "K")}),
-     {},
+    {"an empty start frame is none", Begins(Key(40, ""), {Key(41, "K")}),
      kOpen + Calls{"ReadIFrameFinish(entry,null)"} + Video(10001, kUpdate + WriteKey("K")) + Audio(10001, {}, "null") +
          NothingNew(41, 10001) + kRest + Exit("1", "0")},
     {"describes the stream as at its first key frame",
-     Begins(Key(40, "K"), {Key(41, "L")}),
-     {{"ReadIFrameFinish(entry,null)", [](auto& p) { p.video_codec = p.audio_codec = p.video_extra = "other"; }}},
+     Begins(Key(40, "K"), {Key(41, "L")}) +
+         At("ReadIFrameFinish(entry,null)", [](auto& p) { p.video_codec = p.audio_codec = p.video_extra = "other"; }),
      Started("K") + Video(40, WriteKey("L")) + Audio(10001, {}, "null") + NothingNew(41, 10001) + kRest +
          Exit("1", "0")},
     {"stopped between picture and sound",
-     Begins(Key(40, "K"), {Delta(41, "d")}),
-     {{"ReadFinish(entry,1,position)", Stop}},
+     Begins(Key(40, "K"), {Delta(41, "d")}) + At("ReadFinish(entry,1,position)", Stop),
      Started("K") + Video(40, WriteDelta("d")) + Exit("0", "1")},
-    {"stopped before the first pass", Stop, {}, kNoStart + Exit("0", "1")},
+    {"stopped before the first pass", Stop, kNoStart + Exit("0", "1")},
     {"paused, then on",
-     [](auto& p) { p.common_cfg.m_blPause = 1; },
-     {{"sleep(10)", [](auto& p) { p.common_cfg.m_blPause = 0; }}},
+     [](auto& p) { p.common_cfg.m_blPause = 1; } + At("sleep(10)", [](auto& p) { p.common_cfg.m_blPause = 0; }),
      kNoStart + Calls{"sleep(10)"} + NothingNew(10001, 10001) + kRest + Exit("1", "0")},
     {"dropped frames keep no stream alive",
-     Pictures({Delta(1, "d"), Delta(2, "d"), Delta(3, "d")}),
-     {{"usleep(10000)", Later(20)}},
+     Pictures({Delta(1, "d"), Delta(2, "d"), Delta(3, "d")}) + At("usleep(10000)", Later(20)),
      kNoStart + Video(10001, {}) + Audio(10001, {}, "null") + kRest + Video(1, {}) + Audio(10001, {}, "null") + kRest +
          Video(2, {}) + Audio(10001, {}, "null") + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},
     {"sound alone keeps it alive, and a long pass that wrote is no time-out",
-     Begins(Key(40, "K"), {{}, {}, {}}) + WithSound({Delta(8, "s")}),
-     {{"UpdateStamp()", Later(15)}},
+     Begins(Key(40, "K"), {{}, {}, {}}) + WithSound({Delta(8, "s")}) + At("UpdateStamp()", Later(15)),
      Started("K") + Video(40, {}, "null") + Audio(10001, WriteSound("s")) + NothingNew(40, 8) + kRest +
          NothingNew(40, 8) + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},
     {"failing output is logged for pictures of the loop only",
      kBoth + [](auto& p) { p.flush_fails = true, p.write_result = -1; },
-     {},
      Started("KK") + Video(40, WriteDelta("ddd") + Calls{"log live/4 Failed to fflush data [Cam: 5, errno: 32]\n"}) +
          Audio(10001, WriteSound("s")) + NothingNew(41, 8) + kRest + Exit("1", "0")},
-    {"traces each part at the highest level",
-     kBoth + [](auto& p) { p.log_cfg.m_CategLevel[32] = 6; },
-     {},
+    {"traces each part at the highest level", kBoth + [](auto& p) { p.log_cfg.m_CategLevel[32] = 6; },
      Started("KK") +
          Video(40, Calls{WriteDelta("ddd")[0], "log live/6 Flush video frame. [FrameSize: 3]\n", "fflush()"}) +
          Audio(10001, WriteSound("s") + Calls{"log live/6 Flush latest audio. [FrameSize: 1]\n"}) + NothingNew(41, 8) +

@@ -3,9 +3,7 @@
 // Runs live view requests against the scripted platform.
 #pragma once
 
-#include <map>
 #include <string>
-#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -35,8 +33,7 @@ struct LiveView : ScriptedPlatform {
 struct LoopRow {
     const char* name;
     Change before;
-    std::map<std::string, Change> at;  // what happens at each call of that text
-    Calls calls;                       // from the first StartRead on
+    Calls calls;  // from the first StartRead on
 };
 
 inline void Stop(ScriptedPlatform&) {
@@ -65,12 +62,6 @@ inline void RunLoop(const LoopRow& row, const char* func, const std::function<vo
     LiveView platform;
     platform.log_cfg.m_CategLevel[32] = 5;
     row.before(platform);
-    platform.on_call = [&](const std::string& call) {
-        const auto planned = row.at.find(call);
-        if (planned != row.at.end()) {
-            planned->second(platform);
-        }
-    };
     LiveHandler handler(platform);
     stream(handler);
     EXPECT_EQ(platform.CallsFrom("StartRead"), row.calls);

@@ -176,6 +176,11 @@ TEST(Host, EndsProcessesWhoseClientLeft) {
     }
 }
 
+TEST_F(RunningHost, RepeatsSigtermUntilAHandlerListens) {
+    ASSERT_TRUE(HasPicture(host_.Open("LateStream", admin_)));
+    EXPECT_TRUE(Eventually(8s, [&] { return host_.RequestProcesses() == 0; })) << "well before it is killed";
+}
+
 TEST(Host, LimitsRequestsInAllAndPerUser) {
     const HostUnderTest host({"--max-requests", "5", "--max-requests-per-user", "3"});
     const std::string admin = host.LogIn().secret;
@@ -242,6 +247,7 @@ TEST(Host, LimitsTimeAndMemoryOfWhatDoesNotStream) {
     EXPECT_TRUE(HasPicture(stream)) << "a stream may go on for ever";
 #ifndef __SANITIZE_ADDRESS__
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Devour", admin).status, 500);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Devour&stream=true", admin).status, 200) << "a stream needs its ring";
 #endif
 }
 

@@ -34,9 +34,13 @@ void StopOnSigterm() {
     sigaction(SIGTERM, &action, nullptr);
 }
 
-void Stream(bool deaf) {
+// Leaves SIGTERM alone until that many pictures are sent; -1: for good.
+void Stream(int deaf_pictures) {
     MultipartResponse response;
-    while (deaf || !g_stop) {
+    for (int sent = 0; !g_stop; ++sent) {
+        if (sent == deaf_pictures) {
+            StopOnSigterm();
+        }
         response.Write("image/jpeg", "picture", 7, nullptr);
         usleep(10'000);
     }
@@ -121,21 +125,24 @@ void Serve(APIRequest* request, APIResponse* response) {
     } else if (method == "PeerStream") {
         if (IsAuthPairMatch(request->GetParam("cookie", "").asString(),
                             request->GetParam("timestamp", "").asString())) {
-            Stream(false);
+            Stream(-1);
         }
     } else if (method == "Stream") {
-        StopOnSigterm();
-        Stream(false);
-    } else if (method == "DeafStream") {
+        Stream(0);
+    } else if (method == "LateStream" || method == "DeafStream") {
         signal(SIGTERM, SIG_IGN);
-        Stream(true);
+        Stream(method == "LateStream" ? 30 : -1);
     } else if (method == "Hang") {
         for (;;) {
             pause();
         }
     } else if (method == "Devour") {
-        std::vector<char> much(std::size_t{300} << 20);
-        response->SetSuccess(much.back());
+        if (request->GetParam("stream", false).asBool()) {
+            const MultipartResponse nothing;
+        }
+        std::vector<char> much;
+        much.reserve(std::size_t{300} << 20);
+        response->SetSuccess(much.emplace_back());
     } else if (method == "Crash") {
         std::abort();
     } else if (method == "Surroundings") {
@@ -163,6 +170,7 @@ const Row kTable[] = {{"Test", 1, "Nothing", Serve},
                       {"Test", 1, "RawThenThrow", Serve},
                       {"Test", 1, "EmptyStream", Serve},
                       {"Test", 1, "Stream", Serve},
+                      {"Test", 1, "LateStream", Serve},
                       {"Test", 1, "DeafStream", Serve},
                       {"Test", 1, "Hang", Serve},
                       {"Test", 1, "Devour", Serve},

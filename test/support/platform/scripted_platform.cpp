@@ -80,6 +80,9 @@ void ScriptedPlatform::Record(const std::string& call) {
     if (on_call) {
         on_call(call);
     }
+    if (const auto planned = at.find(call); planned != at.end()) {
+        planned->second(*this);
+    }
 }
 
 VEXO::APIRequest* ScriptedPlatform::Request() {
@@ -95,11 +98,8 @@ VEXO::APIResponse* ScriptedPlatform::Response() {
 }
 
 Calls ScriptedPlatform::CallsFrom(const std::string& text) const {
-    auto first = calls.begin();
-    while (first != calls.end() && first->rfind(text, 0) != 0) {
-        ++first;
-    }
-    return {first, calls.end()};
+    const auto begins = [&](const auto& call) { return call.starts_with(text); };
+    return {std::find_if(calls.begin(), calls.end(), begins), calls.end()};
 }
 
 Calls ScriptedPlatform::CallsOf(const std::string& text) const {

@@ -56,7 +56,7 @@ class ScriptedPlatform;
 using Change = std::function<void(ScriptedPlatform&)>;
 
 // While one exists it is the platform of the process, and decides about sleep, usleep, time, sigaction, shmdt and the
-// state of standard output. Every call is first recorded, then passed to on_call, which may change the script or throw.
+// state of standard output. Every call is first recorded, then passed to on_call, which may throw.
 class ScriptedPlatform {
   public:
     ScriptedPlatform();
@@ -75,6 +75,7 @@ class ScriptedPlatform {
     Calls calls;
     std::vector<LogLine> logs;
     std::function<void(const std::string& call)> on_call;
+    std::map<std::string, Change> at;  // by the text of the call at which the change is made
 
     std::string method, session_id = "5e55";
     std::map<std::string, Json::Value> params;
@@ -147,6 +148,9 @@ inline Change Params(const std::map<std::string, Json::Value>& params) {
             platform.params[name] = value;
         }
     };
+}
+inline Change At(const std::string& call, const Change& change) {
+    return [=](ScriptedPlatform& p) { p.at[call] = change; };
 }
 inline Change operator+(const Change& first, const Change& second) {
     return [=](ScriptedPlatform& p) { first(p), second(p); };

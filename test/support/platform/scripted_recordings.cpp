@@ -56,53 +56,29 @@ Event::Event()
 int Event::Load(int eventId, int mountId, int serverId, int archiveId) {
     return Find("Event::Load", eventId, mountId, serverId, archiveId, *this);
 }
-bool Event::IsSaved() const {
-    return m_blSaved;
-}
-std::string Event::GetFullPath() const {
-    return m_FullPath;
-}
-int Event::GetId() const {
-    return m_Id;
-}
+// A getter that returns its field.
+#define GETTER(type, name, field)                                                                                      \
+    type Event::name() const {                                                                                         \
+        return field;                                                                                                  \
+    }
+GETTER(std::string, GetFullPath, m_FullPath)
+GETTER(int, GetId, m_Id)
+GETTER(std::string, GetPath, m_Path)
+GETTER(int, GetStartTm, m_StartTm)
+GETTER(int, GetEndTm, m_EndTm)
+GETTER(int, GetFrameCount, m_FrameCount)
+GETTER(int, GetVdoType, m_VdoType)
+GETTER(int, GetRecMethod, m_RecMethod)
+GETTER(std::string, GetAudFmt, m_AudFmt)
+GETTER(int, GetImgW, m_ImgW)
+GETTER(int, GetImgH, m_ImgH)
+GETTER(bool, GetRecording, m_blRecording)
+GETTER(bool, GetArchived, m_blArchived)
+GETTER(std::uint64_t, GetSize, m_Size)
+GETTER(bool, IsSaved, m_blSaved)
+#undef GETTER
 int Event::GetIdOnRecServer() const {
     return m_Id + 1000;
-}
-std::string Event::GetPath() const {
-    return m_Path;
-}
-int Event::GetStartTm() const {
-    return m_StartTm;
-}
-int Event::GetEndTm() const {
-    return m_EndTm;
-}
-int Event::GetFrameCount() const {
-    return m_FrameCount;
-}
-int Event::GetVdoType() const {
-    return m_VdoType;
-}
-int Event::GetRecMethod() const {
-    return m_RecMethod;
-}
-std::string Event::GetAudFmt() const {
-    return m_AudFmt;
-}
-int Event::GetImgW() const {
-    return m_ImgW;
-}
-int Event::GetImgH() const {
-    return m_ImgH;
-}
-bool Event::GetRecording() const {
-    return m_blRecording;
-}
-bool Event::GetArchived() const {
-    return m_blArchived;
-}
-std::uint64_t Event::GetSize() const {
-    return m_Size;
 }
 bool Event::IsOriginalView() const {
     return m_CamId == 8;  // the fisheye camera

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The system calls that a script decides about; the linker redirects calls here (--wrap). Without a script they are
-// passed on.
+// The system calls that a script decides about; the linker redirects calls here (--wrap). Without a script those that
+// gtest makes too are passed on.
 #include <cerrno>
 #include <cstdio>
 
@@ -26,13 +26,10 @@ void RecordMutex(const char* what, const pthread_mutex_t* mutex) {
 extern "C" {
 
 int __real_sigaction(int, const struct sigaction*, struct sigaction*);
-unsigned int __real_sleep(unsigned int);
-int __real_usleep(useconds_t);
 std::time_t __real_time(std::time_t*);
 int __real_fflush(std::FILE*);
 int __real_feof(std::FILE*);
 int __real_ferror(std::FILE*);
-int __real_shmdt(const void*);
 void* __real_malloc(std::size_t);
 int __real_pthread_mutex_lock(pthread_mutex_t*);
 int __real_pthread_mutex_unlock(pthread_mutex_t*);
@@ -46,17 +43,11 @@ int __wrap_sigaction(int signal, const struct sigaction* action, struct sigactio
     return Script().failing_signals.count(signal) != 0 ? -1 : __real_sigaction(signal, action, old);
 }
 unsigned int __wrap_sleep(unsigned int seconds) {
-    if (CurrentPlatform() == nullptr) {
-        return __real_sleep(seconds);
-    }
     Script().now += static_cast<std::time_t>(seconds);
     Script().monotonic_now += static_cast<long>(seconds);
     return Call("sleep", seconds), 0;
 }
 int __wrap_usleep(useconds_t microseconds) {
-    if (CurrentPlatform() == nullptr) {
-        return __real_usleep(microseconds);
-    }
     return Call("usleep", microseconds), 0;
 }
 std::time_t __wrap_time(std::time_t* result) {
@@ -80,9 +71,6 @@ int __wrap_ferror(std::FILE* stream) {
     return CurrentPlatform() == nullptr || stream != stdout ? __real_ferror(stream) : Script().is_error;
 }
 int __wrap_shmdt(const void* segment) {
-    if (CurrentPlatform() == nullptr) {
-        return __real_shmdt(segment);
-    }
     return Call(segment == lookhaven::test::AudioRing() ? "audio shmdt" : "shmdt"), 0;
 }
 void* __wrap_malloc(std::size_t size) {
