@@ -24,7 +24,7 @@ class LiveBinding : public Binding {
     LiveBinding() {
         store::Camera camera;
         camera.name = "yard";
-        camera.profiles = {{0, "test:", 640, 360, 10}};
+        camera.profiles = {{0, "test:mjpeg", 0, 0, 0}};
         store::Cameras(records_).Add(camera);
         LHShmCommonCfgAt();  // while there is none
         const control::CommonConfigKeeper recorder(home_);
