@@ -154,7 +154,7 @@ TEST(Playback, PublishesTheTimeOfTheLabelOrTheRate) {
         EXPECT_EQ(unmoved.All("Set("), "1 ") << method;
     }
     Player refused(kByTime);
-    refused.progress_result = 1;
+    refused.progress_result = -1;
     Params({{"mountid", 4}, {"timestamp", Json::Int64{1} << 32}, {"flushHeader", 1}})(refused);
     refused.Run({}, 5);
     EXPECT_EQ(refused.All("ProgressIndicator("), "4294967296 ");

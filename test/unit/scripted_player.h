@@ -68,6 +68,7 @@ struct Player : ScriptedPlatform {
         };
         StdoutCapture capture;
         MjpegStreamHandler(Request(), Response()).HandleProcess();
+        on_call = nullptr;  // gtest flushes standard output too
         return capture.Text();
     }
 
