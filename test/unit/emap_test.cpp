@@ -106,9 +106,9 @@ TEST(Emap, DescribesEachKind) {
         {MakeItem(3, 7, 0, 0), true,
          own + R"(,"ownerDevName":"io7","pairedCamHxId":2,"pairedCamId":17,)" +
              R"("pairedCamIdOnRec":7,"portIdx":0,"portType":4)"},
-        {MakeItem(3, 7, 2, 1), true,
-         other + R"(,"ownerDevName":"io207","pairedCamHxId":2,"pairedCamId":218,)" +
-             R"("pairedCamIdOnRec":207,"portIdx":1,"portType":0)"},
+        {MakeItem(3, 7, 2, 0), true,
+         other + R"(,"ownerDevName":"io207","pairedCamHxId":2,"pairedCamId":217,)" +
+             R"("pairedCamIdOnRec":207,"portIdx":0,"portType":0)"},
         {MakeItem(3, 7, 0, -1), true,
          own + R"(,"ownerDevName":"io7","pairedCamHxId":0,"pairedCamId":0,)" +
              R"("pairedCamIdOnRec":0,"portIdx":-1,"portType":0)"},
@@ -166,6 +166,11 @@ TEST(Emap, ShowsWhatIsThereAndAllowedInOrder) {
         {"denied", all,
          [](auto& p) { p.denied_cameras = {2}, p.denied_emaps = {6}, p.denied_doors = {5}, p.denied_modules = {7}; },
          "4:1@0 ", ""},
+        {"denied module, not another server's of its number",
+         {MakeItem(3, 7), MakeItem(3, 7, 2)},
+         [](auto& p) { p.denied_modules = {7}; },
+         "3:7@2 ",
+         ""},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
