@@ -2,7 +2,7 @@
 """Playback of recorded events: frames a second and processor time beside ffmpeg, the first picture, and the pace.
 
 An hour of 25 pictures a second, as Motion JPEG of 640x360 and as H.264 of 1280x720 with a key frame every two seconds, is put
-on the mount and taken in as a recorder's would be. Prints three Markdown tables.
+on the mount and taken in as a recorder's would be. Prints four Markdown tables.
 """
 
 import dataclasses
@@ -22,6 +22,7 @@ FPS = 25
 HOUR = 3600
 CLIP_SECONDS = 60
 FRAMES = 1500
+STEP_FRAMES = 12  # as the client asks for
 START = 1_772_366_400
 CODECS = {
     "MJPEG": ["-s", "640x360", "-c:v", "mjpeg", "-q:v", "5", "-pix_fmt", "yuvj420p"],
@@ -132,6 +133,27 @@ def print_first_pictures(stand, cookie, recorded):
             print(f"| {codec} | {name} | {statistics.median(times):.1f} | {max(times):.1f} |", flush=True)
 
 
+def print_steps_back(stand, cookie, recorded):
+    """A group of pictures from its end to its beginning, with a request a step, and with one for STEP_FRAMES."""
+    print("| recording | a step back by | p50 ms | mean ms | longest ms |")
+    print("|---|---|---|---|---|")
+    last = HOUR * FPS // 2 + 49
+    for codec, one in recorded.items():
+        for name, frames in (("a request of its own", 1), (f"a request for {STEP_FRAMES} frames", STEP_FRAMES)):
+            times = []
+            for stop in range(last, last - 48, -frames):
+                began = time.monotonic()
+                start = {"framestart": stop - frames + 1, "framestop": stop, "interval": 0}
+                with Player(stand, cookie, eventid=one.event, **start) as player:
+                    for _ in range(frames):
+                        player.next_picture()
+                times += [(time.monotonic() - began) * 1000] + [0.0] * (frames - 1)
+            print(
+                f"| {codec} | {name} | {statistics.median(times):.1f} | {statistics.mean(times):.1f} | {max(times):.1f} |",
+                flush=True,
+            )
+
+
 def print_pace(stand, cookie, recorded):
     print("| recording | played for | pictures | off by |")
     print("|---|---|---|---|")
@@ -163,6 +185,8 @@ def main():
         print_speed(stand, cookie, recorded)
         print()
         print_first_pictures(stand, cookie, recorded)
+        print()
+        print_steps_back(stand, cookie, recorded)
         print()
         print_pace(stand, cookie, recorded)
 

@@ -104,7 +104,6 @@ class Stand(Installation):
              "-subj", "/CN=bench", "-keyout", self.home / "tls/key.pem", "-out", self.home / "tls/certificate.pem"],
             check=True, capture_output=True,
         )
-        self.cli("server", "configure")
         configuration = (ROOT / "packaging/nginx/lookhaven.conf.in").read_text()
         for word, value in {
             "user": "user root root;" if os.geteuid() == 0 else "",
@@ -113,6 +112,7 @@ class Stand(Installation):
             "port": self.port,
             "tls_port": self.tls_port,
             "listen_v6": "",
+            "strict_transport_security": "",
         }.items():
             configuration = configuration.replace(f"@{word}@", str(value))
         path = self.home / "run/nginx.conf"

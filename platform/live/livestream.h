@@ -51,7 +51,8 @@ class LH_PLATFORM_API ShmStreamFifo {
     // wait up to 100 ms for one; a signal ends the wait.
     DataEntry* ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position);
     // The entry after lastSeq, or null when that is the newest; the newest key frame, or the newest audio entry, when
-    // lastSeq has been overwritten or names no entry. Never waits.
+    // lastSeq has been overwritten or names no entry. Of video it may wait up to 100 ms while neither it nor the audio
+    // ring that is read beside it holds anything unread; a signal ends the wait.
     DataEntry* ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position);
     // The newest key frame, or null.
     DataEntry* ReadLatestIFrame();

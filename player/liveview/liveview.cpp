@@ -13,15 +13,18 @@ namespace {
 
 constexpr char kSource[] = "liveview";
 
+// A name that lives as long as the program is not copied into each of many objects.
+using Key = Json::StaticString;
+
 Json::Value DescribeCamera(const Camera& camera, int loginPort, const DevCapHandler& devCap,
                            const std::string& userName) {
     Json::Value description;
-    description["id"] = camera.m_Id;
-    description["name"] = camera.m_szName;
-    description["video_type"] = camera.m_VideoType;
-    description["liveview_port"] = loginPort;
-    description["cam_ptz"] = CamCapUtils::GetLiveStmPtzCapByUserName(devCap, camera, userName);
-    description["sound_support"] = devCap.m_SoundSupport() != 0 ? 1 : 0;
+    description[Key("id")] = camera.m_Id;
+    description[Key("name")] = camera.m_szName;
+    description[Key("video_type")] = camera.m_VideoType;
+    description[Key("liveview_port")] = loginPort;
+    description[Key("cam_ptz")] = CamCapUtils::GetLiveStmPtzCapByUserName(devCap, camera, userName);
+    description[Key("sound_support")] = devCap.m_SoundSupport() != 0 ? 1 : 0;
     return description;
 }
 

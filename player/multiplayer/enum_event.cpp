@@ -19,27 +19,30 @@ constexpr int kMaxSpanSec = 32 * 86400;
 constexpr int kRecordingStateAll = 0;
 constexpr int kRecordingStateFinished = 2;
 
+// A name that lives as long as the program is not copied into each of thousands of objects.
+using Key = Json::StaticString;
+
 Json::Value DescribeEvent(const Event& event, bool withAudio) {
     Json::Value description;
-    description["id"] = event.GetId();
-    description["id_on_RecServer"] = event.GetIdOnRecServer();
-    description["name"] = event.GetPath();
-    description["startTime"] = event.GetStartTm();
-    description["stopTime"] = event.GetEndTm();
-    description["frameCount"] = event.GetFrameCount();
-    description["video_type"] = event.GetVdoType();
-    description["record_type"] = event.GetRecMethod();
-    description["audio_format"] = withAudio ? event.GetAudFmt() : "";
-    description["img_width"] = event.GetImgW();
-    description["img_height"] = event.GetImgH();
-    description["is_recording"] = event.GetRecording();
-    description["archived"] = event.GetArchived();
-    description["event_size"] = static_cast<double>(event.GetSize()) * 0x1p-20;
-    description["fisheye_origin_view"] = event.IsOriginalView();
+    description[Key("id")] = event.GetId();
+    description[Key("id_on_RecServer")] = event.GetIdOnRecServer();
+    description[Key("name")] = event.GetPath();
+    description[Key("startTime")] = event.GetStartTm();
+    description[Key("stopTime")] = event.GetEndTm();
+    description[Key("frameCount")] = event.GetFrameCount();
+    description[Key("video_type")] = event.GetVdoType();
+    description[Key("record_type")] = event.GetRecMethod();
+    description[Key("audio_format")] = withAudio ? event.GetAudFmt() : "";
+    description[Key("img_width")] = event.GetImgW();
+    description[Key("img_height")] = event.GetImgH();
+    description[Key("is_recording")] = event.GetRecording();
+    description[Key("archived")] = event.GetArchived();
+    description[Key("event_size")] = static_cast<double>(event.GetSize()) * 0x1p-20;
+    description[Key("fisheye_origin_view")] = event.IsOriginalView();
     // Older and newer clients read the same three values under different names.
-    description["start"] = event.GetStartTm();
-    description["stop"] = event.GetEndTm();
-    description["frame_count"] = event.GetFrameCount();
+    description[Key("start")] = event.GetStartTm();
+    description[Key("stop")] = event.GetEndTm();
+    description[Key("frame_count")] = event.GetFrameCount();
     return description;
 }
 
@@ -71,9 +74,9 @@ struct CameraSearch {
         std::list<Event> events;
         EventListGetAll(events, filter);
         std::fill(m_Coverage.begin(), m_Coverage.end(), static_cast<unsigned char>(0));
-        entry["event"] = Json::Value(Json::arrayValue);
+        Json::Value& descriptions = entry["event"] = Json::Value(Json::arrayValue);
         for (const Event& event : events) {
-            entry["event"].append(DescribeEvent(event, m_blAudio));
+            descriptions.append(DescribeEvent(event, m_blAudio));
             if (IsCovering(event.GetRecMethod())) {
                 MarkCoverage(event, m_From, m_Coverage);
             }

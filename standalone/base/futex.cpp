@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/futex.h"
 
+#include <array>
 #include <cerrno>
 #include <climits>
 #include <ctime>
@@ -9,6 +10,8 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include "standalone/base/clock.h"
+
 namespace lookhaven::base {
 
 bool SleepWhile(const std::atomic<std::uint32_t>& word, std::uint32_t seen, std::chrono::microseconds timeout) {
@@ -16,6 +19,18 @@ bool SleepWhile(const std::atomic<std::uint32_t>& word, std::uint32_t seen, std:
     const timespec relative{static_cast<time_t>(seconds.count()),
                             static_cast<long>(std::chrono::nanoseconds(timeout - seconds).count())};
     return syscall(SYS_futex, &word, FUTEX_WAIT, seen, &relative, nullptr, 0) == 0 || errno != EINTR;
+}
+
+bool SleepWhileBoth(const SeenWord& first, const SeenWord& second, std::chrono::microseconds timeout) {
+    const auto waiter = [](const SeenWord& word) {
+        return futex_waitv{word.seen, reinterpret_cast<std::uintptr_t>(&word.word), FUTEX_32, 0};
+    };
+    const std::array<futex_waitv, 2> waiters{waiter(first), waiter(second)};
+    const std::int64_t until_micros = MonotonicMicros() + timeout.count();
+    const timespec until{static_cast<time_t>(until_micros / 1'000'000),
+                         static_cast<long>(until_micros % 1'000'000 * 1000)};
+    return syscall(SYS_futex_waitv, waiters.data(), waiters.size(), 0, &until, CLOCK_MONOTONIC) >= 0 ||
+           errno == EAGAIN || errno == ETIMEDOUT;
 }
 
 void Wake(std::atomic<std::uint32_t>& word) {

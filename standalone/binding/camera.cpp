@@ -15,8 +15,6 @@
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/groups.h"
-#include "standalone/store/mounts.h"
-#include "standalone/store/recording_plans.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 
@@ -123,11 +121,17 @@ int Camera::GetUiStreamNo(CAM_PROFILE_TYPE profile) const {
 
 std::string Camera::GetStoragePath() const {
     return OrFailure("Camera::GetStoragePath", std::string(), [&]() -> std::string {
-        store::Store& records = RequestContext::Current().Records();
-        const auto mount = lookhaven::binding::MayUse(m_Id, store::CameraAccess::kPlayback)
-                               ? store::Mounts(records).FindForPlan(store::RecordingPlans(records).Find(m_Id).mount_id)
-                               : std::nullopt;
-        return mount ? std::filesystem::path(mount->path) / std::to_string(m_Id) : std::filesystem::path();
+        if (!lookhaven::binding::MayUse(m_Id, store::CameraAccess::kPlayback)) {
+            return {};
+        }
+        RequestContext& context = RequestContext::Current();
+        const auto plan = context.Plans().find(m_Id);
+        const int planned = plan == context.Plans().end() ? 0 : plan->second.mount_id;
+        const auto mount = std::ranges::find_if(context.Mounts(), [planned](const store::Mount& each) {
+            return planned != 0 ? each.id == planned : each.is_default;
+        });
+        return mount == context.Mounts().end() ? std::filesystem::path()
+                                               : std::filesystem::path(mount->path) / std::to_string(m_Id);
     });
 }
 

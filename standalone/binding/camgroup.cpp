@@ -3,13 +3,14 @@
 // Sets of cameras to play back from, without those that are denied to the caller.
 #include "platform/camera/camgroup.h"
 
+#include <algorithm>
+#include <vector>
+
 #include "standalone/binding/camera_record.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
-#include "standalone/store/mounts.h"
-#include "standalone/store/recording_plans.h"
 
 namespace store = lookhaven::store;
 using lookhaven::binding::DeniedCameras;
@@ -25,9 +26,10 @@ Camera RemovedCamera(int id) {
     return camera;
 }
 
-std::map<int, Camera> RecordsOf(const std::set<int>& ids, bool with_removed) {
+std::map<int, Camera> RecordsOf(const std::vector<store::Camera>& records, const std::set<int>& ids,
+                                bool with_removed) {
     std::map<int, Camera> cameras;
-    for (const store::Camera& record : store::Cameras(RequestContext::Current().Records()).List()) {
+    for (const store::Camera& record : records) {
         if (ids.contains(record.id)) {
             cameras.emplace(record.id, lookhaven::binding::PlatformCamera(record));
         }
@@ -46,15 +48,15 @@ std::set<int> Without(std::set<int> ids, const std::set<int>& denied) {
 }
 
 // The cameras whose plan names the mount.
-std::set<int> RecordingOn(store::Store& records, int mount_id) {
-    store::Mounts mounts(records);
-    const auto fallback = mounts.FindForPlan(0);
-    const auto plans = store::RecordingPlans(records).List();
+std::set<int> RecordingOn(const std::vector<store::Camera>& cameras, int mount_id) {
+    RequestContext& context = RequestContext::Current();
+    const auto fallback = std::ranges::find_if(context.Mounts(), &store::Mount::is_default);
+    const int fallback_id = fallback == context.Mounts().end() ? 0 : fallback->id;
     std::set<int> ids;
-    for (const store::Camera& camera : store::Cameras(records).List()) {
-        const auto plan = plans.find(camera.id);
-        const int planned = plan == plans.end() ? 0 : plan->second.mount_id;
-        if (mount_id == 0 || mount_id == (planned != 0 ? planned : fallback ? fallback->id : 0)) {
+    for (const store::Camera& camera : cameras) {
+        const auto plan = context.Plans().find(camera.id);
+        const int planned = plan == context.Plans().end() ? 0 : plan->second.mount_id;
+        if (mount_id == 0 || mount_id == (planned != 0 ? planned : fallback_id)) {
             ids.insert(camera.id);
         }
     }
@@ -76,15 +78,18 @@ int CamGroup::Load(int groupId) {
 }
 
 std::map<int, Camera> CamGroup::GetCamMap() const {
-    const auto group = store::Groups(RequestContext::Current().Records()).Find(m_Id);
-    return group ? RecordsOf(Without(group->camera_ids, DeniedCameras(store::CameraAccess::kPlayback)), true)
+    store::Store& records = RequestContext::Current().Records();
+    const auto group = store::Groups(records).Find(m_Id);
+    return group ? RecordsOf(store::Cameras(records).List(),
+                             Without(group->camera_ids, DeniedCameras(store::CameraAccess::kPlayback)), true)
                  : std::map<int, Camera>{};
 }
 
 std::map<int, Camera> GetCamMountMap(int mountId, const std::string& deniedIds, bool withDeleted) {
     store::Store& records = RequestContext::Current().Records();
-    std::set<int> ids = RecordingOn(records, mountId);
+    const std::vector<store::Camera> cameras = store::Cameras(records).List();
+    std::set<int> ids = RecordingOn(cameras, mountId);
     ids.merge(store::Events(records).CamerasOn(mountId));
     ids = Without(std::move(ids), lookhaven::binding::IdSet(deniedIds));
-    return RecordsOf(Without(std::move(ids), DeniedCameras(store::CameraAccess::kPlayback)), withDeleted);
+    return RecordsOf(cameras, Without(std::move(ids), DeniedCameras(store::CameraAccess::kPlayback)), withDeleted);
 }

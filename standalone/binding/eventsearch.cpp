@@ -3,15 +3,18 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cstring>
 #include <filesystem>
 #include <limits>
 #include <map>
 #include <span>
 #include <string_view>
+#include <tuple>
 #include <vector>
 
 #include "standalone/archive/recording_log.h"
 #include "standalone/binding/event_record.h"
+#include "standalone/binding/large_pages.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/events.h"
@@ -43,11 +46,32 @@ store::EventFilter FilterOf(const EventFilterParam& asked) {
     return filter;
 }
 
+// Whether any of the bytes is not 0, looked at eight at once.
+bool HasAny(const unsigned char* begin, const unsigned char* end) {
+    std::uint64_t any = 0;
+    for (; end - begin >= 8 && any == 0; begin += 8) {
+        std::memcpy(&any, begin, 8);
+    }
+    return any != 0 || std::any_of(begin, end, [](unsigned char byte) { return byte != 0; });
+}
+
 int ValueOf(const unsigned char* recorded, const unsigned char* covered, int begin, int end) {
-    const auto any = [begin, end](const unsigned char* bytes) {
-        return std::any_of(bytes + begin, bytes + end, [](unsigned char byte) { return byte != 0; });
-    };
-    return any(covered) ? kEvent : any(recorded) ? kRecorded : kNothing;
+    return HasAny(covered + begin, covered + end)     ? kEvent
+           : HasAny(recorded + begin, recorded + end) ? kRecorded
+                                                      : kNothing;
+}
+
+// By start and id, as Events::List; the nodes are moved, not the events.
+void SortByStart(std::list<Event>& events) {
+    std::vector<std::tuple<int, int, std::list<Event>::iterator>> order;
+    order.reserve(events.size());
+    for (auto event = events.begin(); event != events.end(); ++event) {
+        order.emplace_back(event->m_StartTm, event->m_Id, event);
+    }
+    std::ranges::sort(order, {}, [](const auto& each) { return std::pair(std::get<0>(each), std::get<1>(each)); });
+    for (const auto& [start, id, event] : order) {
+        events.splice(events.end(), events, event);
+    }
 }
 
 std::string_view Trim(std::string_view text) {
@@ -68,14 +92,22 @@ EventFilterParam::EventFilterParam()
 
 int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
     return OrFailure("EventListGetAll", -1, [&] {
-        store::Store& records = RequestContext::Current().Records();
+        RequestContext& context = RequestContext::Current();
+        lookhaven::binding::PrepareForManyObjects();
         std::map<int, std::string> mount_paths;
-        for (const store::Mount& mount : store::Mounts(records).List()) {
+        for (const store::Mount& mount : context.Mounts()) {
             mount_paths[mount.id] = mount.path;
         }
-        for (const store::Event& event : store::Events(records).List(FilterOf(filter))) {
-            events.push_back(lookhaven::binding::PlatformEvent(event, mount_paths[event.mount_id]));
+        const store::EventFilter asked = FilterOf(filter);
+        std::list<Event> found;
+        store::Events(context.Records()).Visit(asked, [&](const store::Event& event) {
+            found.push_back(lookhaven::binding::PlatformEvent(event, mount_paths[event.mount_id]));
+        });
+        if (asked.camera_ids.size() > 1) {
+            SortByStart(found);
         }
+        const auto skipped = std::min<std::size_t>(static_cast<std::size_t>(asked.offset), found.size());
+        events.splice(events.end(), found, std::next(found.begin(), static_cast<std::ptrdiff_t>(skipped)), found.end());
         return 0;
     });
 }
@@ -84,7 +116,7 @@ int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
 int ReadRecLog(const std::string& storagePath, long from, int duration, unsigned char* buffer) {
     return OrFailure("ReadRecLog", -1, [&] {
         const std::filesystem::path asked(storagePath);
-        const std::vector<store::Mount> mounts = store::Mounts(RequestContext::Current().Records()).List();
+        const std::vector<store::Mount>& mounts = RequestContext::Current().Mounts();
         if (duration <= 0 || std::ranges::none_of(mounts, [&](const store::Mount& mount) {
                 return asked.parent_path() == mount.path;
             })) {

@@ -46,6 +46,9 @@ namespace {
 constexpr std::int64_t kMaxAttachMicros = 5'000'000;
 constexpr long kAttachPollNanos = 10'000'000;
 
+// The sound that this process reads beside its picture; without a position until the module begins to read it.
+ring::Companion g_sound;
+
 ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
     return reinterpret_cast<ring::Position*>(position);
 }
@@ -131,7 +134,8 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
         }
         const ring::StreamId id{camId, streamNo, base::Medium::kAudio};
         void* sound = context.MayHear() ? ring::Attach(context.Installation(), id) : nullptr;
-        return sound != nullptr ? sound : ring::AttachEmpty(id, {});
+        g_sound = {sound != nullptr ? sound : ring::AttachEmpty(id, {}), nullptr};
+        return g_sound.ring;
     });
     return static_cast<ShmStreamFifo*>(stream);
 }
@@ -139,6 +143,9 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
 void ShmStreamFifo::StartRead(__tag_DATA_ENTRY_INFO* position) {
     if (position != nullptr) {
         ring::StartRead(this, Inner(position));
+        if (this == g_sound.ring) {
+            g_sound.position = Inner(position);
+        }
     }
 }
 
@@ -153,7 +160,9 @@ DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* positio
 
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    return Held(ring::ReadNext(this, lastSeq, Inner(position)));
+    const bool has_sound_beside = g_sound.position != nullptr && this != g_sound.ring;
+    return Held(has_sound_beside ? ring::ReadNext(this, lastSeq, Inner(position), g_sound)
+                                 : ring::ReadNext(this, lastSeq, Inner(position)));
 }
 
 DataEntry* ShmStreamFifo::ReadLatestIFrame() {
@@ -172,6 +181,9 @@ void ShmStreamFifo::ReadFinish(DataEntry* entry, bool, __tag_DATA_ENTRY_INFO* po
 void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
     RequestContext::Current().SetHeldEntry(nullptr);
     ring::StopRead(this, Inner(position));
+    if (this == g_sound.ring) {
+        g_sound = {};
+    }
 }
 
 void ShmStreamFifo::GetVdoExtraData(unsigned char* data, int& length) {

@@ -37,6 +37,26 @@ void RequireKnownShape(const Json::Value& priv_data) {
     }
 }
 
+// The caller's account; nothing for one that was removed and for who has none.
+const std::optional<store::User>& CallersAccount() {
+    RequestContext& context = RequestContext::Current();
+    std::optional<std::optional<store::User>>& known = context.Known().caller;
+    if (!known) {
+        known = store::Users(context.Records()).Find(static_cast<int>(context.Caller()));
+    }
+    return *known;
+}
+
+// The cameras that the caller's account is denied.
+const std::set<int>& DeniedToAccount(store::CameraAccess kind) {
+    RequestContext& context = RequestContext::Current();
+    std::map<store::CameraAccess, std::set<int>>& known = context.Known().denied_cameras;
+    const auto found = known.find(kind);
+    return found != known.end()
+               ? found->second
+               : known[kind] = store::Users(context.Records()).DeniedCameras(static_cast<int>(context.Caller()), kind);
+}
+
 std::set<int> IdsUnder(const Json::Value& priv_data, const char* member) {
     std::set<int> cameras;
     for (const Json::Value& camera : priv_data[member]) {
@@ -72,9 +92,7 @@ bool MayUse(int camera, store::CameraAccess kind) {
     if (caller == PAIR_AUTH_UID) {
         return true;
     }
-    store::Users users(context.Records());
-    const int id = static_cast<int>(caller);
-    return users.Find(id) && !users.DeniedCameras(id, kind).contains(camera);
+    return CallersAccount() && !DeniedToAccount(kind).contains(camera);
 }
 
 bool MaySee(store::DeniableItem kind, int id) {
@@ -83,15 +101,14 @@ bool MaySee(store::DeniableItem kind, int id) {
     if (caller == 0 || caller == PAIR_AUTH_UID) {
         return caller != 0;
     }
-    store::Users users(context.Records());
-    const int user = static_cast<int>(caller);
-    return users.Find(user) && !users.DeniedItems(user, kind).contains(id);
+    return CallersAccount() &&
+           !store::Users(context.Records()).DeniedItems(static_cast<int>(caller), kind).contains(id);
 }
 
 bool IsManager() {
-    RequestContext& context = RequestContext::Current();
-    const auto user = store::Users(context.Records()).Find(static_cast<int>(context.Caller()));
-    return user && user->IsManager() && context.RequestRestrictions().privilege <= store::Privilege::kManager;
+    const std::optional<store::User>& user = CallersAccount();
+    return user && user->IsManager() &&
+           RequestContext::Current().RequestRestrictions().privilege <= store::Privilege::kManager;
 }
 
 std::set<int> DeniedCameras(store::CameraAccess kind) {
@@ -99,12 +116,10 @@ std::set<int> DeniedCameras(store::CameraAccess kind) {
     std::set<int> denied;
     context.RequestRestrictions().AddTo(denied, kind);
     if (context.Caller() != PAIR_AUTH_UID) {
-        store::Users users(context.Records());
-        const int id = static_cast<int>(context.Caller());
-        if (!users.Find(id)) {  // removed meanwhile: everything is denied, which no set can say
+        if (!CallersAccount()) {  // removed meanwhile: everything is denied, which no set can say
             throw std::runtime_error("the caller's account was removed");
         }
-        denied.merge(users.DeniedCameras(id, kind));
+        denied.insert(DeniedToAccount(kind).begin(), DeniedToAccount(kind).end());
     }
     return denied;
 }
@@ -197,15 +212,16 @@ PrivProfile PrivProfileGetByUid(unsigned int uid) {
         if (uid == PAIR_AUTH_UID) {
             data->id = static_cast<int>(PAIR_AUTH_UID);
         } else {
-            store::Users users(RequestContext::Current().Records());
-            const auto user = users.Find(static_cast<int>(uid));
+            const bool is_caller = uid == RequestContext::Current().Caller();
+            const auto user = is_caller ? lookhaven::binding::CallersAccount() : Users().Find(static_cast<int>(uid));
             if (!user) {
                 return PrivProfile();
             }
             data->id = user->id;
             data->privilege = static_cast<int>(user->privilege);
             for (const store::CameraAccess kind : store::kEveryAccess) {
-                data->denied_cameras[static_cast<int>(kind)] = users.DeniedCameras(user->id, kind);
+                data->denied_cameras[static_cast<int>(kind)] =
+                    is_caller ? lookhaven::binding::DeniedToAccount(kind) : Users().DeniedCameras(user->id, kind);
             }
         }
         if (uid == RequestContext::Current().Caller()) {

@@ -6,6 +6,8 @@
 #include <memory>
 #include <sstream>
 
+#include "standalone/binding/compact_json.h"
+
 namespace {
 
 bool IsOneOf(std::string_view name, std::initializer_list<std::string_view> names) {
@@ -28,19 +30,14 @@ std::optional<Json::Value> StrictJson(const std::string& text) {
     return std::nullopt;
 }
 
-constexpr unsigned int kAllDigits = 17;
 constexpr unsigned int kSafeDigits = 15;  // the most that every decimal fraction keeps
 
-Json::StreamWriterBuilder CompactStyle(unsigned int digits) {
+Json::StreamWriterBuilder ScalarStyle() {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
     builder["emitUTF8"] = true;
-    builder["precision"] = digits;
+    builder["precision"] = kSafeDigits;
     return builder;
-}
-
-std::string CompactText(const Json::Value& value) {
-    return Json::writeString(CompactStyle(kAllDigits), value);
 }
 
 // Writes one value after the other. To make a writer costs more than to write a number.
@@ -53,7 +50,7 @@ class ScalarWriter {
     }
 
   private:
-    std::unique_ptr<Json::StreamWriter> writer_{CompactStyle(kSafeDigits).newStreamWriter()};
+    std::unique_ptr<Json::StreamWriter> writer_{ScalarStyle().newStreamWriter()};
     std::ostringstream stream_;
 };
 
@@ -89,7 +86,9 @@ Json::Value JsonFromText(std::string_view name, const std::string& text) {
 }
 
 std::string SuccessText(const Json::Value& data) {
-    return "{\"data\":" + CompactText(data) + ",\"success\":true}";
+    std::string text = R"({"data":)";
+    AppendCompactJson(text, data);
+    return text += R"(,"success":true})";
 }
 
 }  // namespace lookhaven::binding
@@ -159,8 +158,9 @@ void APIResponse::SetSuccess(const Json::Value& data) {
 }
 
 void APIResponse::SetError(int code, const Json::Value& data) {
-    m_pContext->answer =
-        R"({"error":{"code":)" + std::to_string(code) + R"(,"data":)" + CompactText(data) + R"(},"success":false})";
+    std::string& text = m_pContext->answer.emplace(R"({"error":{"code":)" + std::to_string(code) + R"(,"data":)");
+    lookhaven::binding::AppendCompactJson(text, data);
+    text += R"(},"success":false})";
 }
 
 void APIResponse::SetEnableOutput(bool enable) {

@@ -51,7 +51,22 @@ store::Store& RequestContext::Records() {
     return *records_;
 }
 
+const std::vector<store::Mount>& RequestContext::Mounts() {
+    if (!known_.mounts) {
+        known_.mounts = store::Mounts(Records()).List();
+    }
+    return *known_.mounts;
+}
+
+const std::map<int, store::RecordingPlan>& RequestContext::Plans() {
+    if (!known_.plans) {
+        known_.plans = store::RecordingPlans(Records()).List();
+    }
+    return *known_.plans;
+}
+
 void RequestContext::CloseRecords() {
+    known_ = {};
     if (records_ != nullptr) {
         records_.reset();
         // What the store worked with is half of a viewer's own memory, and there may be hundreds of viewers.

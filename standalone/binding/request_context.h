@@ -9,16 +9,20 @@
 
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <set>
 #include <string>
+#include <vector>
 
 #include "platform/export.h"
 #include "standalone/base/installation.h"
 #include "standalone/binding/output.h"
 #include "standalone/control/demand.h"
 #include "standalone/ring/stream.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/recording_plans.h"
 #include "standalone/store/store.h"
 #include "standalone/store/users.h"
 
@@ -47,6 +51,14 @@ struct Restrictions {
     void AddTo(std::set<int>& denied, store::CameraAccess kind) const;
 };
 
+// What the store told about the caller and the mounts. A search asks for the same once for each of its cameras.
+struct KnownRecords {
+    std::optional<std::optional<store::User>> caller;
+    std::map<store::CameraAccess, std::set<int>> denied_cameras;  // to the caller
+    std::optional<std::vector<store::Mount>> mounts;
+    std::optional<std::map<int, store::RecordingPlan>> plans;
+};
+
 class LH_PLATFORM_API RequestContext {
   public:
     // The context of this process. Belongs to no installation until Begin.
@@ -65,13 +77,20 @@ class LH_PLATFORM_API RequestContext {
 
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
+    // What this request has read; empty after CloseRecords and for another caller.
+    KnownRecords& Known() { return known_; }
+    const std::vector<store::Mount>& Mounts();
+    const std::map<int, store::RecordingPlan>& Plans();
     // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever
     // is about to send or to wait calls this; references from Records are invalid afterwards.
     void CloseRecords();
 
     // The caller: a user's id, PAIR_AUTH_UID for a paired host, 0 for nobody.
     unsigned int Caller() const { return caller_; }
-    void SetCaller(unsigned int user_id) { caller_ = user_id; }
+    void SetCaller(unsigned int user_id) {
+        caller_ = user_id;
+        known_ = {};
+    }
     // The handle of the caller's session; empty when there is none.
     const std::string& Session() const { return session_; }
     void SetSession(const std::string& handle) { session_ = handle; }
@@ -106,6 +125,7 @@ class LH_PLATFORM_API RequestContext {
     Output* output_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
+    KnownRecords known_;
     unsigned int caller_ = 0;
     std::string session_;
     Restrictions restrictions_;

@@ -35,10 +35,14 @@ const char* Reason(int status) {
 
 }  // namespace
 
-std::string JsonAnswer(int status, const std::string& body, const std::string& extra) {
+std::string JsonHead(int status, std::size_t body_bytes, const std::string& extra) {
     return "Status: " + std::to_string(status) + ' ' + Reason(status) +
            "\r\nContent-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
-           std::to_string(body.size()) + "\r\n" + extra + "\r\n" + body;
+           std::to_string(body_bytes) + "\r\n" + extra + "\r\n";
+}
+
+std::string JsonAnswer(int status, const std::string& body, const std::string& extra) {
+    return JsonHead(status, body.size(), extra) + body;
 }
 
 std::string FailureAnswer(const Failure& failure) {

@@ -24,7 +24,10 @@ class Failure : public std::runtime_error {
     int retry_after_s_;
 };
 
-// The whole answer with a body of JSON. extra: further header lines, each ending in CR LF.
+// The head of an answer with a body of JSON. extra: further header lines, each ending in CR LF.
+std::string JsonHead(int status, std::size_t body_bytes, const std::string& extra = "");
+
+// The whole answer. extra: further header lines, each ending in CR LF.
 std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
 
 // {"success": false, "error": {"code": status, "data": null, "message": …}}

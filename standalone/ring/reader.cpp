@@ -28,6 +28,10 @@ void Unpin(void* ring, Position& position) {
     position.pinned = -1;
 }
 
+std::int64_t Deadline(int wait_millis) {
+    return base::MonotonicMicros() + std::clamp(wait_millis, 0, kMaxWaitMillis) * 1000;
+}
+
 }  // namespace
 
 void* Attach(const base::Installation& installation, const StreamId& id) try {
@@ -99,7 +103,7 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
         return nullptr;
     }
     const SegmentHead& head = read.Head();
-    const std::int64_t deadline = base::MonotonicMicros() + std::clamp(wait_millis, 0, kMaxWaitMillis) * 1000;
+    const std::int64_t deadline = Deadline(wait_millis);
     for (;;) {
         const std::uint32_t wake = head.wake.load();
         if (head.newest.load() != read.LastCount(last_sequence)) {
@@ -133,6 +137,25 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position) {
         }
     }
     return read.PinCurrent(head.newest_key);  // of an audio ring the newest entry
+}
+
+const Entry* ReadNext(void* ring, int last_sequence, Position* position, const Companion& other, int wait_millis) {
+    const SegmentHead& head = View(ring).Head();
+    const SegmentHead& other_head = View(other.ring).Head();
+    const std::int64_t deadline = Deadline(wait_millis);
+    for (;;) {
+        const base::SeenWord wake{head.wake, head.wake.load()};
+        const base::SeenWord other_wake{other_head.wake, other_head.wake.load()};
+        if (const Entry* entry = ReadNext(ring, last_sequence, position)) {
+            return entry;
+        }
+        const bool has_other = other_head.newest.load() != other.position->count && other_head.newest_key.load() != 0;
+        const std::int64_t left = deadline - base::MonotonicMicros();
+        if (has_other || left <= 0 || head.retired.load() != 0 || other_head.retired.load() != 0 ||
+            !base::SleepWhileBoth(wake, other_wake, std::chrono::microseconds(left))) {
+            return nullptr;
+        }
+    }
 }
 
 const Entry* ReadLatestIFrame(void* ring) {

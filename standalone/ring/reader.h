@@ -56,6 +56,15 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
 // The entry after last_sequence, or null when that is the newest. When last_sequence is no longer in the ring: the
 // newest key frame, or the newest entry of an audio ring. Never waits.
 const Entry* ReadNext(void* ring, int last_sequence, Position* position);
+// A stream's other ring and how far the caller has read it; both are borrowed.
+struct Companion {
+    void* ring = nullptr;
+    const Position* position = nullptr;
+};
+// As ReadNext, but while neither ring holds anything unread it waits up to wait_millis (at most kMaxWaitMillis) for an
+// entry of either. A signal cuts the wait. Where the kernel cannot wait for two rings it returns at once.
+const Entry* ReadNext(void* ring, int last_sequence, Position* position, const Companion& other,
+                      int wait_millis = kMaxWaitMillis);
 // The newest key frame, or null. Pinned for the process until ReadIFrameFinish.
 const Entry* ReadLatestIFrame(void* ring);
 

@@ -14,19 +14,45 @@ namespace {
 
 constexpr int kRowsAtOnce = 10'000;
 
-// The filter's rows of each of its cameras, one query a camera: that way both engines use the index (camera, start)
-// for all of it, the order too, however many cameras are asked for.
-void Search(soci::session& sql, const EventFilter& filter, std::int64_t limit, const Events::Visitor& visit) {
+// As PostgreSQL writes an array.
+std::string ArrayText(const std::set<int>& ids) {
+    std::string text = "{";
+    for (const int id : ids) {
+        text += (text.size() > 1 ? "," : "") + std::to_string(id);
+    }
+    return text + "}";
+}
+
+// For PostgreSQL: the rows of each camera of an array that meet the condition.
+std::string EachCameraText(const std::string& condition, const std::string& order) {
+    return std::string("select ") + Mapping<Event>::kColumns +
+           " from unnest(cast(:cameras as integer[])) as asked (camera) cross join lateral"
+           " (select * from events where camera_id = asked.camera" +
+           condition + ") as found order by camera_id, " + order;
+}
+
+// The filter's rows, camera by camera. Either engine looks each camera up by itself: that way it uses the index (camera,
+// start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera; PostgreSQL, to
+// which a question is a message and an answer, once.
+void Search(Connection& connection, soci::session& sql, const EventFilter& filter, std::int64_t limit,
+            const Events::Visitor& visit) {
     // Nothing starts before this and still reaches the span.
     const std::int64_t earliest = std::max(filter.begin_s, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds;
+    const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
+    const std::string condition =
+        " and start_s >= :earliest and start_s < :end and end_s > :begin and :mount in (0, mount_id)"
+        " and :reason in (0, reason) and (:finished = 0 or recording = 0) order by " +
+        order + " limit :limit";
+    if (!connection.IsSqlite()) {
+        const std::string cameras = ArrayText(filter.camera_ids);
+        Query<Event>(sql, kOnce, EachCameraText(condition, order), cameras, earliest, filter.end_s, filter.begin_s,
+                     filter.mount_id, filter.reason, filter.finished_only, limit)
+            .ForEach(visit);
+        return;
+    }
     int camera = 0;
-    Query<Event> rows(sql, kRepeatedly,
-                      "where camera_id = :camera and start_s >= :earliest and start_s < :end and end_s > :begin"
-                      " and :mount in (0, mount_id) and :reason in (0, reason) and (:finished = 0 or recording = 0)"
-                      " order by " +
-                          std::string(filter.newest_first ? "start_s desc, id desc" : "start_s, id") + " limit :limit",
-                      camera, earliest, filter.end_s, filter.begin_s, filter.mount_id, filter.reason,
-                      filter.finished_only, limit);
+    Query<Event> rows(sql, kRepeatedly, "where camera_id = :camera" + condition, camera, earliest, filter.end_s,
+                      filter.begin_s, filter.mount_id, filter.reason, filter.finished_only, limit);
     for (const int id : filter.camera_ids) {
         camera = id;
         rows.ForEach(visit);
@@ -44,7 +70,7 @@ std::vector<Event> Events::List(const EventFilter& filter) {
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
     std::vector<Event> events;
     connection_.Read([&](soci::session& sql) {
-        Search(sql, filter, static_cast<std::int64_t>(offset + limit),
+        Search(connection_, sql, filter, static_cast<std::int64_t>(offset + limit),
                [&](const Event& event) { events.push_back(event); });
     });
     const auto key = [](const Event& event) { return std::pair(event.start_s, event.id); };
@@ -57,8 +83,9 @@ std::vector<Event> Events::List(const EventFilter& filter) {
 }
 
 void Events::Visit(const EventFilter& filter, const Visitor& visitor) {
-    connection_.Read(
-        [&](soci::session& sql) { Search(sql, filter, std::numeric_limits<std::int64_t>::max(), visitor); });
+    connection_.Read([&](soci::session& sql) {
+        Search(connection_, sql, filter, std::numeric_limits<std::int64_t>::max(), visitor);
+    });
 }
 
 std::vector<Event> Events::Open() {

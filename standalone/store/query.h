@@ -83,8 +83,8 @@ int Execute(soci::session& sql, const std::string& text, const Parameter&... par
     return Run(statement);
 }
 
-// A question whose answer is rows. text: for a mapped record what follows "select … from <table> ", else all of it.
-// Parameters as in Prepare.
+// A question whose answer is rows. text: all of it, or for a mapped record what follows
+// "select … from <table> ", unless it begins with "select" itself. Parameters as in Prepare.
 template <typename Row>
 class Query {
   public:
@@ -115,6 +115,9 @@ class Query {
   private:
     static std::string Whole(const std::string& text) {
         if constexpr (requires { Mapping<Row>::kTable; }) {
+            if (text.starts_with("select ")) {
+                return text;
+            }
             return std::string("select ") + Mapping<Row>::kColumns + " from " + Mapping<Row>::kTable + " " + text;
         } else {
             return text;

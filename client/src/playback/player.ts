@@ -32,6 +32,8 @@ const kTailSilenceMs = 1_500;
 /** A list rounds a recording's end to seconds. */
 const kExactUntilMs = 1_000;
 const kCannotPlay = 200;
+/** A frame is decoded from the key frame before it on, so a step back keeps this many that are passed for the next steps. */
+const kKeptFrames = 12;
 
 export class Player {
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
@@ -51,6 +53,8 @@ export class Player {
   /** While paused: the frame requested last, until it is shown; and the request that is under way. */
   #wanted: Start | null = null;
   #fetching: AbortSignal | null = null;
+  /** What the last step back to the server has passed. */
+  readonly #kept = new Map<number, RecordedFrame>();
 
   /** `changed` is called with every frame and every other change. */
   constructor(recordings: Recordings, changed: () => void) {
@@ -83,7 +87,10 @@ export class Player {
   /** Changes to a recording, `sinceStartMs` after its start. */
   open(footage: Footage, sinceStartMs: number, isPlaying: boolean): void {
     const isSame = this.#footage?.kind === footage.kind && this.#footage.id === footage.id;
-    if (!isSame) this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
+    if (!isSame) {
+      this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
+      this.#kept.clear();
+    }
     this.#take(footage);
     const start = this.#startAt(sinceStartMs);
     if (isPlaying) void this.#play(start);
@@ -109,7 +116,8 @@ export class Player {
     const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.#index;
     const last = this.#footage.isGrowing || !this.#footage.frameCount ? Infinity : this.#footage.frameCount - 1;
     const index = Math.max(0, Math.min(from + by, last));
-    if (index !== this.#index || this.#state.kind !== "paused") this.#showStill({ index });
+    const start: Start = by < 0 ? { index, from: Math.max(0, index - kKeptFrames + 1) } : { index };
+    if (index !== this.#index || this.#state.kind !== "paused") this.#showStill(start);
   }
 
   /** Changes a running stream, without interruption where the server can do that. */
@@ -127,6 +135,7 @@ export class Player {
   /** Closes the connection, and goes back to having nothing to play. */
   close(): void {
     this.#begin();
+    this.#kept.clear();
     this.#footage = null;
     this.#become({ kind: "empty" });
   }
@@ -177,9 +186,17 @@ export class Player {
   /** Shows one frame; false when that failed, which has become the state. */
   async #fetch(start: Start, signal: AbortSignal): Promise<boolean> {
     const footage = this.#footage!;
+    const kept = "index" in start ? this.#kept.get(start.index) : undefined;
+    if (kept) {
+      await this.#showFrame(kept, signal);
+      return !signal.aborted;
+    }
+    this.#kept.clear();
     let isShown = false;
     const open = (until: AbortSignal) => this.#recordings.play(footage, start, "one", 1, newStreamKey(), until);
     const take = async (frame: RecordedFrame) => {
+      if ("index" in start && start.from !== undefined) this.#kept.set(frame.index, frame);
+      if ("index" in start && frame.index < start.index) return true;
       await this.#showFrame(frame, signal);
       isShown = true;
       return false;
@@ -200,6 +217,7 @@ export class Player {
   async #play(start: Start): Promise<void> {
     const signal = this.#begin();
     this.#opening = start;
+    this.#kept.clear();
     this.#become({ kind: "opening" });
     let next = start;
     if ("timeMs" in start) {

@@ -61,7 +61,9 @@ export interface Group {
 }
 
 /** Where a stream begins: at a frame, or (recorded events only) at the frame of a time since the recording's start. */
-export type Start = { index: number } | { timeMs: number };
+export type Start =
+  /** With `from` the frames from there on come first, as fast as they can. */
+  { index: number; from?: number } | { timeMs: number };
 
 /** How far a stream goes: one frame, all there is, or on with what is still being recorded. */
 export type Extent = "one" | "all" | "growing";
@@ -195,7 +197,8 @@ export class Recordings {
         : [
             "PlayMjpegEvent",
             {
-              framestart: String(start.index),
+              framestart: String(start.from ?? start.index),
+              ...(start.from === undefined ? {} : { interval: "0" }),
               framestop: String(extent === "one" ? start.index : extent === "all" ? -1 : kFarFrame),
               recEvtType: String(kKinds[footage.kind]),
             },

@@ -45,7 +45,7 @@ describe("a player", () => {
     expect(archive.asked[2]).toBe("event7 frame 0 to -1 at 1");
   });
 
-  test("pause closes the stream; steps fetch single frames within the recording and end at the last one asked for", async () => {
+  test("pause closes the stream; steps stay within the recording and end at the last one asked for", async () => {
     player.open(footage(7), 0, true);
     await untilFrame(3);
     player.pause();
@@ -57,6 +57,16 @@ describe("a player", () => {
     expect(archive.asked.slice(1)).toEqual([1, 5].map((by) => `event7 frame ${at + by} to ${at + by} at 1`));
     player.step(-1000);
     await vi.waitFor(() => expect([player.index, player.state.kind, ...archive.streams]).toEqual([0, "paused"]));
+    player.open(footage(7), 4_000, false);
+    await vi.waitFor(() => expect([player.index, player.state.kind]).toEqual([40, "paused"]));
+    archive.asked.length = seen.length = 0;
+    for (let index = 39; index >= 27; index -= 1) {
+      player.step(-1);
+      await vi.waitFor(() => expect([player.index, player.state.kind]).toEqual([index, "paused"]));
+    }
+    // Steps back fetch frames ahead of need, whose decoding they share.
+    expect(archive.asked).toEqual(["event7 frame 28 to 39 at 1", "event7 frame 16 to 27 at 1"]);
+    expect(seen).toHaveLength(13);
   });
 
   test("a frame that is being decoded at a pause is told to be unwanted: picture and number stay the same", async () => {

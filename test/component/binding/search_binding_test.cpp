@@ -160,6 +160,7 @@ TEST_F(FootageBinding, FindsEventsAndTheirSeconds) {
     EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\1\0\0\0\0", 12));
     std::filesystem::create_directories(folder_ / "former" / "1");
     store::Mounts(records_).Add({.name = "Former", .path = (folder_ / "former").string()});
+    Call(1);  // mounts are asked for once a request
     archive::WriteRecordingLog(folder_ / "former" / "1", kNoon + 4, kNoon + 7, 3);
     ASSERT_EQ(ReadRecLog(camera.GetStoragePath(), kNoon - 3, 12, bytes), 0);
     EXPECT_EQ(seconds, std::string("\0\0\0\1\1\1\1\3\3\3\0\0", 12)) << "what it recorded elsewhere before";

@@ -29,9 +29,18 @@ class ReadingTest : public RingTest {
         ASSERT_NE(ring_, nullptr);
         StartRead(ring_, &position_);
     }
+    // Opens the stream's other ring, too, which reads of the first one wait for.
+    void OpenSound() {
+        sound_writer_.emplace(installation_, kAudio, StreamFormat{"AAC", {}, 0, 0, true}, kSmall);
+        sound_ = {Attach(installation_, kAudio), &sound_position_};
+        StartRead(sound_.ring, &sound_position_);
+    }
+    void WriteSound() { sound_writer_->Write({.data = MakeData(64, 1)}); }
     void TearDown() override {
         Detach(ring_);
+        Detach(sound_.ring);
         writer_.reset();
+        sound_writer_.reset();
     }
 
     // The frame's data follows from its count.
@@ -60,6 +69,9 @@ class ReadingTest : public RingTest {
     std::optional<Writer> writer_;
     void* ring_ = nullptr;
     Position position_;
+    std::optional<Writer> sound_writer_;
+    Position sound_position_;
+    Companion sound_;
     std::uint64_t written_ = 0;
 };
 
@@ -179,21 +191,33 @@ TEST_F(ReadingTest, EntriesWithoutAPositionAreHeldUntilTheyAreReleasedAndTakeNoS
 
 TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
     Open(kVideo, kMjpeg, kSmall);
+    OpenSound();
     ASSERT_TRUE(Write());
+    enum Read { kLatest, kNext, kNextBesideUnreadSound };
     struct Row {
         const char* name;
+        Read read;
         int wait_ms;
         int min_ms;
         int sleeps;
     };
     // Far above what a busy machine adds, far below what a wait of the whole time or without an end would take.
     constexpr int kMaxMs = 30'000;
-    for (const Row& row : {Row{"time", 60, 60, 1}, Row{"longest time", 120'000, 100, 1}, Row{"no wait", 0, 0, 0}}) {
+    for (const Row& row :
+         {Row{"time", kLatest, 60, 60, 1}, Row{"longest time", kLatest, 120'000, 100, 1},
+          Row{"no wait", kLatest, 0, 0, 0}, Row{"of both rings", kNext, 60, 60, 1},
+          Row{"of both rings, longest time", kNext, 120'000, 100, 1}, Row{"no wait of both rings", kNext, 0, 0, 0},
+          Row{"sound goes first", kNextBesideUnreadSound, 120'000, 0, 0}}) {
         SCOPED_TRACE(row.name);
         rusage before{};
         ::getrusage(RUSAGE_THREAD, &before);
         const std::int64_t begin = base::MonotonicMicros();
-        EXPECT_EQ(ReadLatest(ring_, 0, &position_, row.wait_ms), nullptr);
+        if (row.read == kNextBesideUnreadSound) {
+            WriteSound();
+        }
+        EXPECT_EQ(row.read == kLatest ? ReadLatest(ring_, 0, &position_, row.wait_ms)
+                                      : ReadNext(ring_, 0, &position_, sound_, row.wait_ms),
+                  nullptr);
         const std::int64_t took_ms = (base::MonotonicMicros() - begin) / 1000;
         rusage after{};
         ::getrusage(RUSAGE_THREAD, &after);
@@ -204,8 +228,9 @@ TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
     }
 }
 
-TEST_F(ReadingTest, AFrameAndASignalEndAWait) {
+TEST_F(ReadingTest, AFrameASoundAndASignalEndAWait) {
     Open(kVideo, kMjpeg, kSmall);
+    OpenSound();
     ASSERT_TRUE(Write());
     static std::atomic<int> signals{0};
     struct sigaction interrupt {};
@@ -213,8 +238,10 @@ TEST_F(ReadingTest, AFrameAndASignalEndAWait) {
     ::sigaction(SIGUSR1, &interrupt, nullptr);
     // A wait may time out before the test sees it: the frame then ends a later one, the signal none.
     int interrupted = 0;
-    for (int round = 0; round < 20 || interrupted == 0; ++round) {
+    for (int round = 0; round < 40 || interrupted < 2; ++round) {
         const bool by_frame = round % 2 == 0;
+        const bool of_both = round % 4 >= 2;
+        const bool by_sound = by_frame && of_both && round % 8 >= 4;
         const int last = static_cast<int>(written_) - 1;
         std::atomic<pid_t> thread{0};
         std::atomic<bool> is_done{false};
@@ -223,16 +250,23 @@ TEST_F(ReadingTest, AFrameAndASignalEndAWait) {
             thread = ::gettid();
             const Entry* entry = nullptr;
             do {
-                entry = ReadLatest(ring_, last, &position_);
+                entry = of_both ? ReadNext(ring_, last, &position_, sound_) : ReadLatest(ring_, last, &position_);
+                if (by_sound && entry == nullptr) {
+                    entry =
+                        ReadNext(sound_.ring,
+                                 sound_position_.count == 0 ? kNoSequence : static_cast<int>(sound_position_.count) - 1,
+                                 &sound_position_);
+                }
             } while (by_frame && entry == nullptr);
             is_done = true;
             EXPECT_EQ(entry != nullptr, by_frame);
             ReadFinish(ring_, entry, &position_);
+            ReadFinish(sound_.ring, entry, &sound_position_);
         });
         const auto sleeps = [&] { return thread != 0 && test::IsAsleep(thread) && !is_done; };
         if (by_frame) {
             EXPECT_TRUE(test::Eventually(sleeps));
-            Write();
+            by_sound ? WriteSound() : void(Write());
             EXPECT_FALSE(sleeps()) << "the frame does not wake it";
         }
         while (!is_done) {
