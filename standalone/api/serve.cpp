@@ -24,6 +24,7 @@ namespace {
 constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
 constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
 constexpr std::size_t kMaxBodyWithoutSession = 4096;
+constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
 
 // Under a sanitizer a process maps terabytes before main.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -78,6 +79,9 @@ std::string RunModule(EntryFunction entry, const Call& call) {
     std::fflush(stdout);
     if (call.context.output()->BytesSent() > 0) {
         return "";
+    }
+    if (call.context.HasStoreFailed()) {
+        throw Failure(500, kStoreFailed);
     }
     if (given.answer && given.output_enabled) {
         return http::JsonAnswer(200, *given.answer);
@@ -146,6 +150,9 @@ std::string ServeOrFail(const Service& service, http::Request& request, control:
         return http::FailureAnswer(Failure(400, "a parameter has the wrong type"));
     } catch (const std::bad_alloc&) {
         return http::FailureAnswer(Failure(500, "the answer needs too much memory; ask for less at once"));
+    } catch (const store::StoreError& error) {
+        base::LogError(std::string("the request failed: ") + error.what());
+        return http::FailureAnswer(Failure(500, kStoreFailed));
     } catch (const std::exception& error) {
         base::LogError(std::string("the request failed: ") + error.what());
     } catch (...) {

@@ -97,6 +97,10 @@ class LH_PLATFORM_API RequestContext {
     // The camera is denied to the caller, who must not be able to tell it from one that does not exist.
     void NoteHidden() { is_hidden_ = true; }
 
+    // The store has failed, so what the module takes for an empty list or a missing record is none.
+    void NoteStoreFailure() { has_store_failed_ = true; }
+    bool HasStoreFailed() const { return has_store_failed_; }
+
     // The ring entry that was read last and not given back; null when there is none.
     const ring::Entry* HeldEntry() const { return held_entry_; }
     void SetHeldEntry(const ring::Entry* entry) { held_entry_ = entry; }
@@ -114,14 +118,16 @@ class LH_PLATFORM_API RequestContext {
     bool is_stream_ = false;
     bool wants_picture_ = false;
     bool is_hidden_ = false;
+    bool has_store_failed_ = false;
     const ring::Entry* held_entry_ = nullptr;
 };
 
-// Writes "name: what" to the log.
+// Writes "name: what" to the log, and notes a failure of the store.
 void LogFailure(const char* name, const std::exception& error);
 
 // The result of ask, or failure when it throws; the exception is logged under the name. For calls that can tell the
-// module nothing but success or failure.
+// module nothing but success or failure. Where it was the store that failed, the request fails, whatever the module
+// answers.
 template <typename Result, typename Ask>
 Result OrFailure(const char* name, Result failure, Ask&& ask) {
     try {
