@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <string>
+#include <system_error>
 
 #include <unistd.h>
 
@@ -89,7 +90,13 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     if (archive::RecordingReader(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }
-    media::LoadRemuxLibrary().Copy(path, STDOUT_FILENO, options);
+    try {
+        media::LoadRemuxLibrary().Copy(path, STDOUT_FILENO, options);
+    } catch (const std::system_error& error) {
+        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
+            throw;
+        }  // else the client has gone, which is no failure
+    }
 }
 
 }  // namespace lookhaven::api
