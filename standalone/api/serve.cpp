@@ -2,6 +2,7 @@
 #include "standalone/api/serve.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cstdio>
 #include <new>
 
@@ -39,6 +40,17 @@ void LimitAddressSpace(rlim_t max_bytes) {
         limit.rlim_cur = std::min(max_bytes, limit.rlim_max);
         ::setrlimit(RLIMIT_AS, &limit);
     }
+}
+
+int PortIn(std::string_view text) {
+    int port = 0;
+    std::from_chars(text.data(), text.data() + text.size(), port);
+    return port;
+}
+
+binding::TcpConnection ConnectionOf(const http::Request& request) {
+    return {std::string(request.Header("SERVER_ADDR")), PortIn(request.Header("SERVER_PORT")),
+            std::string(request.Header("REMOTE_ADDR")), PortIn(request.Header("REMOTE_PORT"))};
 }
 
 // Cookie and session come first: nobody without a session may cost more than a short request.
@@ -177,7 +189,10 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
         slot.pairing = store::PairingId(secret);
         AdmitPairedHost(slots, slot, service.limits);
     };
-    binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
+    binding::RequestContext& context = binding::RequestContext::Current();
+    context.Begin(service.installation, &output, std::move(events));
+    binding::SendQueue queue(STDOUT_FILENO, ConnectionOf(request));
+    context.SetQueue(&queue);
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);
     // What was written before an exception cannot be taken back, and nothing may follow it.

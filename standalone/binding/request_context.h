@@ -17,6 +17,7 @@
 #include "platform/export.h"
 #include "standalone/base/installation.h"
 #include "standalone/binding/output.h"
+#include "standalone/binding/send_queue.h"
 #include "standalone/control/demand.h"
 #include "standalone/ring/stream.h"
 #include "standalone/store/store.h"
@@ -62,6 +63,9 @@ class LH_PLATFORM_API RequestContext {
     // Throws std::logic_error before Begin.
     const base::Installation& Installation() const;
     Output* output() const { return output_; }
+    // What of the output is still on its way to the viewer; null when nobody knows. Borrowed like the output.
+    SendQueue* Queue() const { return queue_; }
+    void SetQueue(SendQueue* queue) { queue_ = queue; }
 
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
@@ -108,6 +112,7 @@ class LH_PLATFORM_API RequestContext {
   private:
     std::optional<base::Installation> installation_;
     Output* output_ = nullptr;
+    SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
     unsigned int caller_ = 0;
