@@ -9,12 +9,12 @@
 
 namespace lookhaven::recorder {
 
-RecordingReport::RecordingReport(const base::Installation& installation) : installation_(installation) {
+RecordingReport::RecordingReport(std::function<void(const States&)> write) : write_(std::move(write)) {
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
 
-void RecordingReport::Publish(std::vector<maintenance::RecordingStatus> states) {
+void RecordingReport::Publish(States states) {
     const std::lock_guard lock(mutex_);
     next_ = std::move(states);
     published_.notify_one();
@@ -35,7 +35,7 @@ void RecordingReport::Run(const std::stop_token& stop) {
 
 bool RecordingReport::TryToWrite(const States& states) noexcept {
     try {
-        maintenance::WriteRecordingStatus(installation_, states);
+        write_(states);
         return true;
     } catch (const std::exception& failure) {
         base::LogWarning(failure.what());

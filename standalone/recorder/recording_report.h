@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Writes the cameras' recording states to the file for the operator, in a thread of its own.
+// Hands the cameras' recording states to what writes them to the file for the operator, in a thread of its own.
 //
 // Why so        A slow disk must not hold up the supervisor, which tells viewers every second that the recorder is alive.
 // Thread safety Any thread.
@@ -8,24 +8,26 @@
 
 #include <atomic>
 #include <condition_variable>
+#include <functional>
 #include <mutex>
 #include <optional>
 #include <thread>
 #include <vector>
 
-#include "standalone/base/installation.h"
 #include "standalone/maintenance/recording_status.h"
 
 namespace lookhaven::recorder {
 
 class RecordingReport {
   public:
-    // Starts the thread, which takes no signals. The installation must outlive this object. Throws std::system_error
-    // when no thread can be started.
-    explicit RecordingReport(const base::Installation& installation);
+    using States = std::vector<maintenance::RecordingStatus>;
+
+    // Starts the thread, which takes no signals and calls write. What write throws is logged, and it is called again for
+    // the next states. Throws std::system_error when no thread can be started.
+    explicit RecordingReport(std::function<void(const States&)> write);
 
     // Has the thread write the states where they differ from the last; does not wait.
-    void Publish(std::vector<maintenance::RecordingStatus> states);
+    void Publish(States states);
 
     // Lets the thread write what was published, then ends it; does not wait.
     void RequestStop() { thread_.request_stop(); }
@@ -33,12 +35,10 @@ class RecordingReport {
     bool HasEnded() const { return has_ended_; }
 
   private:
-    using States = std::vector<maintenance::RecordingStatus>;
-
     void Run(const std::stop_token& stop);
     bool TryToWrite(const States& states) noexcept;
 
-    const base::Installation& installation_;
+    const std::function<void(const States&)> write_;
     std::mutex mutex_;
     std::condition_variable_any published_;
     std::optional<States> next_;

@@ -23,7 +23,9 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit)
     : no_data_limit_(no_data_limit),
       flush_requests_(installation),
-      report_(installation),
+      report_([&installation](const RecordingReport::States& states) {
+          maintenance::WriteRecordingStatus(installation, states);
+      }),
       rows_(installation.StoreUrl()),
       maintenance_(installation.StoreUrl(), "maintain the recordings",
                    [this](store::Store& store, const std::stop_token&) { Maintain(store); }) {}

@@ -3,15 +3,10 @@
 // Maintenance of several mounts, one of which fails; a disk that hangs.
 #include "standalone/recorder/recording_supervisor.h"
 
-#include <atomic>
-#include <thread>
+#include <future>
 
-#include <fcntl.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include "standalone/base/file.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
 #include "test/support/footage/archive_folder.h"
@@ -20,34 +15,28 @@
 namespace lookhaven::recorder {
 namespace {
 
-base::Installation Prepare(const std::filesystem::path& home) {
-    base::Installation::CreateFolders(home);
-    base::Installation installation(home);
-    store::Store::Migrate(installation.StoreUrl());
-    return installation;
-}
-
-TEST(RecordingSupervisor, DoesNotWaitForADiskThatHangs) {
-    const test::ArchiveFolder home;
-    const base::Installation installation = Prepare(home.Path());
-    const std::filesystem::path disk = installation.RunFolder() / ("recordings." + std::to_string(getpid()) + ".new");
-    ASSERT_EQ(mkfifo(disk.c_str(), 0600), 0);  // opening it for writing waits for a reader
-    RecordingSupervisor supervisor(installation, std::chrono::seconds(1));
-    std::atomic<bool> done = false;
-    std::jthread second([&] {
-        supervisor.DoEverySecond();
-        done = true;
+TEST(RecordingReport, HoldsNobodyUpWhileTheDiskHangs) {
+    std::promise<void> disk;
+    std::vector<std::size_t> written;
+    RecordingReport report([&, ready = disk.get_future().share()](const RecordingReport::States& states) {
+        ready.wait();
+        written.push_back(states.size());
     });
-    EXPECT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return done.load(); }));
-    supervisor.RequestStop();
-    EXPECT_FALSE(supervisor.HasEnded()) << "the disk did not hang";
-    const base::FileDescriptor reader = base::OpenFile(disk, O_RDONLY);
-    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
+    for (const std::size_t cameras : {1U, 1U, 2U, 3U}) {
+        report.Publish(RecordingReport::States(cameras));
+    }
+    report.RequestStop();
+    EXPECT_FALSE(report.HasEnded()) << "it waits for the disk in its own thread";
+    disk.set_value();
+    ASSERT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return report.HasEnded(); }));
+    EXPECT_EQ(written.back(), 3U);
 }
 
 TEST(RecordingSupervisor, MaintainsTheMountsBesideOneThatFails) {
     const test::ArchiveFolder home;
-    const base::Installation installation = Prepare(home.Path());
+    base::Installation::CreateFolders(home.Path());
+    const base::Installation installation(home.Path());
+    store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
     std::filesystem::create_directory(home / "disk");
     int id = 0;
