@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <string>
+#include <system_error>
 
 #include <unistd.h>
 
@@ -76,17 +77,26 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     options.with_sound = binding::MayUse(footage->camera_id, store::CameraAccess::kAudio);
     const std::string head = "Status: 200 OK\r\nContent-Type: video/x-matroska\r\nCache-Control: no-store\r\n"
                              "Content-Disposition: " +
-                             Disposition(TitleOf(records, *footage)) + "\r\n\r\n";
+                             Disposition(TitleOf(records, *footage)) + "\r\nContent-Length: ";
+    // Announced, so that a copy that fails midway is seen to be cut.
+    options.announce = [&head](std::int64_t size_bytes) {
+        const std::string whole = head + std::to_string(size_bytes) + "\r\n\r\n";
+        std::fwrite(whole.data(), 1, whole.size(), stdout);
+        std::fflush(stdout);
+    };
     call.context.CloseRecords();
     call.context.NoteStream();
     // Checked while an error answer is still possible.
     if (archive::RecordingReader(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }
-    const media::RemuxLibrary& library = media::LoadRemuxLibrary();
-    std::fwrite(head.data(), 1, head.size(), stdout);
-    std::fflush(stdout);
-    library.Copy(path, STDOUT_FILENO, options);
+    try {
+        media::LoadRemuxLibrary().Copy(path, STDOUT_FILENO, options);
+    } catch (const std::system_error& error) {
+        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
+            throw;
+        }  // else the client has gone, which is no failure
+    }
 }
 
 }  // namespace lookhaven::api

@@ -55,7 +55,7 @@ std::vector<std::uint8_t> Jpeg(KeyFrame frame) {
         return std::move(frame.data);
     }
     try {
-        return media::LoadDecoderLibrary().Still(frame.codec, frame.data);
+        return media::LoadDecoderLibrary().Still(frame.codec, frame.data, base::kMaxFrameBytes);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());
         throw Failure(504, "the camera's picture cannot be decoded");

@@ -4,7 +4,9 @@
 #include <algorithm>
 #include <chrono>
 #include <functional>
+#include <optional>
 #include <thread>
+#include <utility>
 
 #include "standalone/api/own_apis.h"
 #include "standalone/control/player_file.h"
@@ -16,8 +18,9 @@ namespace {
 
 constexpr int kMaxRate = 16;
 constexpr int kMinRate = -8;
-constexpr std::chrono::milliseconds kSignalPoll{2};
+constexpr std::chrono::milliseconds kPoll{2};
 constexpr std::chrono::milliseconds kSignalLimit{1'000};
+constexpr std::chrono::milliseconds kOpenLimit{1'000};
 
 // The player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such player.
 control::SlotUse FindPlayer(const Call& call) {
@@ -33,34 +36,71 @@ control::SlotUse FindPlayer(const Call& call) {
 }
 
 // As SlotTable::ChangePause. Throws Failure 404 when the player has ended.
-control::Pause ChangePause(const control::SlotUse& use, const std::function<void(control::Pause&)>& change) {
-    const auto before = control::SlotTable::ChangePause(use, change);
-    if (!before) {
+void ChangePause(const control::SlotUse& use, const std::function<void(control::Pause&)>& change) {
+    if (!control::SlotTable::ChangePause(use, change)) {
         throw Failure(404, "the player has ended");
     }
-    return *before;
+}
+
+std::optional<control::ProgressFile> FindProgress(const Call& call, const control::Player& player) {
+    return control::ProgressFile::Open(call.context.Installation().ProgressFolder(), player.key,
+                                       call.context.Session());
 }
 
 control::ProgressFile ProgressOf(const Call& call, const control::Player& player) {
-    auto file =
-        control::ProgressFile::Open(call.context.Installation().ProgressFolder(), player.key, call.context.Session());
+    auto file = FindProgress(call, player);
     if (!file) {
-        throw Failure(409, "the player cannot be reached under this timestamp");
+        throw Failure(409, "the player has been replaced");
     }
     return *std::move(file);
 }
 
-std::string SetRate(const Call& call) {
+// A player first takes its signals and its progress file, then sets the rate that it was started with there.
+bool IsOpen(const Call& call, const control::Player& player) {
+    if (player.started_us == 0) {
+        return false;
+    }
+    const auto progress = player.takes_rate ? FindProgress(call, player) : std::nullopt;
+    return !player.takes_rate || (progress && progress->Get() != control::ProgressFile::kUnset);
+}
+
+// As FindPlayer, but waits while the player opens its recording: what is asked of it before that would be lost. Throws
+// Failure 409 when that takes too long.
+control::SlotUse AwaitPlayer(const Call& call) {
     const control::SlotUse use = FindPlayer(call);
-    const control::Player& player = use.slot->player;
+    const auto until = std::chrono::steady_clock::now() + kOpenLimit;
+    while (!IsOpen(call, use.slot->player)) {
+        if (use.IsOver()) {
+            throw Failure(404, "the player has ended");
+        }
+        if (std::chrono::steady_clock::now() > until) {
+            throw Failure(409, "the player is still opening the recording");
+        }
+        std::this_thread::sleep_for(kPoll);
+    }
+    return use;
+}
+
+control::SharedLock LockPlayers(const Call& call) {
+    control::SharedLock lock = call.slots.LockPlayers();
+    if (!lock) {
+        throw Failure(503, "the player was not reached in time");
+    }
+    return lock;
+}
+
+std::string SetRate(const Call& call) {
     const Json::Value& asked = call.Parameter("rate");
     const int rate = asked.isInt() ? asked.asInt() : 0;
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
     }
+    const control::SlotUse use = AwaitPlayer(call);
+    const control::Player& player = use.slot->player;
     if (!player.takes_rate) {
         throw Failure(409, "this player does not take its rate from here");
     }
+    const control::SharedLock lock = LockPlayers(call);
     bool waits = false;
     ChangePause(use, [&waits, rate](control::Pause& pause) {
         waits = pause.on && rate > 1;
@@ -75,7 +115,7 @@ std::string SetRate(const Call& call) {
 }
 
 std::string GetPosition(const Call& call) {
-    const control::Player& player = FindPlayer(call).slot->player;
+    const control::Player& player = AwaitPlayer(call).slot->player;
     if (!player.tells_position) {
         throw Failure(409, "this player does not tell its position here");
     }
@@ -93,39 +133,45 @@ void AwaitPause(const Call& call, const control::SlotUse& use, bool on) {
         if (use.IsOver() || std::chrono::steady_clock::now() > until) {
             throw Failure(503, "the player was not reached in time");
         }
-        std::this_thread::sleep_for(kSignalPoll);
+        std::this_thread::sleep_for(kPoll);
+    }
+}
+
+// Changes the request, and the rate with it: a player that stands still has rate 1 at most.
+void RequestPause(const Call& call, const control::SlotUse& use, bool on) {
+    const control::SharedLock lock = LockPlayers(call);
+    std::optional<control::ProgressFile> progress;
+    if (use.slot->player.takes_rate) {
+        progress = ProgressOf(call, use.slot->player);
+    }
+    const int rate = progress ? progress->Get() : 1;
+    int next = 0;  // 0: as it is
+    ChangePause(use, [&next, on, rate](control::Pause& pause) {
+        pause.on = on;
+        if (on) {
+            next = rate > 1 ? 1 : 0;
+            pause.resumed_rate = rate > 1 ? rate : pause.resumed_rate;
+        } else {
+            next = std::exchange(pause.resumed_rate, 0);
+        }
+    });
+    if (progress && next != 0) {
+        progress->Set(next);
     }
 }
 
 std::string Pause(const Call& call) {
-    const control::SlotUse use = FindPlayer(call);
-    const control::Player& player = use.slot->player;
     const Json::Value& asked = call.Parameter("on");
     if (!asked.isBool()) {
         throw Failure(400, "on must be true or false");
     }
     const bool on = asked.asBool();
-    if (!player.can_pause) {
+    const control::SlotUse use = AwaitPlayer(call);
+    if (!use.slot->player.can_pause) {
         throw Failure(409, "this player cannot be paused");
     }
-    int rate = 0;  // that it has before, if it must be slowed down
-    if (on && player.takes_rate) {
-        control::ProgressFile progress = ProgressOf(call, player);
-        if (rate = progress.Get(); rate > 1) {
-            progress.Set(1);
-        }
-    }
-    ChangePause(use, [on, rate](control::Pause& pause) {
-        pause.on = on;
-        pause.resumed_rate = rate > 1 ? rate : pause.resumed_rate;
-    });
+    RequestPause(call, use, on);
     AwaitPause(call, use, on);
-    if (!on) {
-        const int resumed = ChangePause(use, [](control::Pause& pause) { pause.resumed_rate = 0; }).resumed_rate;
-        if (resumed != 0) {
-            ProgressOf(call, player).Set(resumed);
-        }
-    }
     Json::Value data;
     data["on"] = on;
     return SuccessAnswer(data);

@@ -42,6 +42,7 @@ void PreparePlayer(const Call& call) {
     player.tells_position = !shares_rate;
     player.can_pause = by_times && is_paced && (shares_rate || IntOr(call, "playrate", 1) <= 1);
     player.max_players = PlayersPerSession(call.Records());
+    player.key = call.NumberOr("timestamp", 0);  // last: from here on others may look at it
 }
 
 }  // namespace lookhaven::api

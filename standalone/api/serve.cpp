@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <charconv>
 #include <cstdio>
 #include <new>
 
@@ -26,6 +27,7 @@ namespace {
 constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
 constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
 constexpr std::size_t kMaxBodyWithoutSession = 4096;
+constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
 
 // Under a sanitizer a process maps terabytes before main.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -40,6 +42,17 @@ void LimitAddressSpace(rlim_t max_bytes) {
         limit.rlim_cur = std::min(max_bytes, limit.rlim_max);
         ::setrlimit(RLIMIT_AS, &limit);
     }
+}
+
+int PortIn(std::string_view text) {
+    int port = 0;
+    std::from_chars(text.data(), text.data() + text.size(), port);
+    return port;
+}
+
+binding::TcpConnection ConnectionOf(const http::Request& request) {
+    return {std::string(request.Header("SERVER_ADDR")), PortIn(request.Header("SERVER_PORT")),
+            std::string(request.Header("REMOTE_ADDR")), PortIn(request.Header("REMOTE_PORT"))};
 }
 
 // Cookie and session come first: nobody without a session may cost more than a short request.
@@ -87,6 +100,9 @@ std::string RunModule(EntryFunction entry, const Call& call) {
     std::fflush(stdout);
     if (call.context.output()->BytesSent() > 0) {
         return "";
+    }
+    if (call.context.HasStoreFailed()) {
+        throw Failure(500, kStoreFailed);
     }
     if (given.answer && given.output_enabled) {
         SendJson(*call.context.output(), *given.answer);
@@ -156,6 +172,9 @@ std::string ServeOrFail(const Service& service, http::Request& request, control:
         return http::FailureAnswer(Failure(400, "a parameter has the wrong type"));
     } catch (const std::bad_alloc&) {
         return http::FailureAnswer(Failure(500, "the answer needs too much memory; ask for less at once"));
+    } catch (const store::StoreError& error) {
+        base::LogError(std::string("the request failed: ") + error.what());
+        return http::FailureAnswer(Failure(500, kStoreFailed));
     } catch (const std::exception& error) {
         base::LogError(std::string("the request failed: ") + error.what());
     } catch (...) {
@@ -180,7 +199,10 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
         slot.pairing = store::PairingId(secret);
         AdmitPairedHost(slots, slot, service.limits);
     };
-    binding::RequestContext::Current().Begin(service.installation, &output, std::move(events));
+    binding::RequestContext& context = binding::RequestContext::Current();
+    context.Begin(service.installation, &output, std::move(events));
+    binding::SendQueue queue(STDOUT_FILENO, ConnectionOf(request));
+    context.SetQueue(&queue);
     const std::string answer = ServeOrFail(service, request, slots, slot);
     std::fflush(stdout);
     // What was written before an exception cannot be taken back, and nothing may follow it.

@@ -20,6 +20,7 @@
 #include "standalone/store/cameras.h"
 
 namespace base = lookhaven::base;
+namespace binding = lookhaven::binding;
 namespace control = lookhaven::control;
 namespace ring = lookhaven::ring;
 namespace store = lookhaven::store;
@@ -48,6 +49,8 @@ constexpr long kAttachPollNanos = 10'000'000;
 
 // The sound that this process reads beside its picture; without a position until the module begins to read it.
 ring::Companion g_sound;
+// A muxed stream needs each frame, so it falls behind on a slow way; from here on it skips to a key frame.
+constexpr std::int64_t kMaxBehindMs = 2'000;
 
 ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
     return reinterpret_cast<ring::Position*>(position);
@@ -63,6 +66,47 @@ DataEntry* Held(const ring::Entry* entry) {
 void EndReaderOfRetired(const void* stream) {
     if (ring::IsRetired(stream)) {
         std::raise(SIGTERM);
+    }
+}
+
+bool IsWayFree() {
+    binding::SendQueue* queue = RequestContext::Current().Queue();
+    return queue == nullptr || queue->IsShort();
+}
+
+// Waits, no longer than the ring itself does, until what was sent before has left; false when it has not, or a signal came.
+bool AwaitFreeWay() {
+    constexpr timespec kPoll{0, 3'000'000};
+    const std::int64_t until_us = MonotonicMicros() + ring::kMaxWaitMillis * 1000;
+    while (!IsWayFree()) {
+        if (MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool IsBehind(const ring::Entry& entry) {
+    return base::WallMillis() - entry.CaptureMillis() > kMaxBehindMs;
+}
+
+// The next entry, or, once that is too old, the first key frame that is not.
+const ring::Entry* ReadNextVideo(void* stream, int last_sequence, ring::Position* position) {
+    static bool is_skipping = false;
+    for (;;) {
+        const ring::Entry* entry = g_sound.position != nullptr
+                                       ? ring::ReadNext(stream, last_sequence, position, g_sound)
+                                       : ring::ReadNext(stream, last_sequence, position);
+        is_skipping = is_skipping || (entry != nullptr && IsBehind(*entry));
+        if (entry == nullptr || !is_skipping) {
+            return entry;
+        }
+        if ((entry->flags & ring::kKeyFrame) != 0 && !IsBehind(*entry)) {
+            is_skipping = false;
+            return entry;
+        }
+        last_sequence = entry->sequence;
+        ring::ReadFinish(stream, entry, position);
     }
 }
 
@@ -155,14 +199,15 @@ DataEntry* ShmStreamFifo::ReadLatest() {
 
 DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    return Held(ring::ReadLatest(this, lastSeq, Inner(position)));
+    return Held(AwaitFreeWay() ? ring::ReadLatest(this, lastSeq, Inner(position)) : nullptr);
 }
 
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    const bool has_sound_beside = g_sound.position != nullptr && this != g_sound.ring;
-    return Held(has_sound_beside ? ring::ReadNext(this, lastSeq, Inner(position), g_sound)
-                                 : ring::ReadNext(this, lastSeq, Inner(position)));
+    if (ring::MediumOf(this) != base::Medium::kVideo) {
+        return Held(ring::ReadNext(this, lastSeq, Inner(position)));
+    }
+    return Held(IsWayFree() ? ReadNextVideo(this, lastSeq, Inner(position)) : nullptr);
 }
 
 DataEntry* ShmStreamFifo::ReadLatestIFrame() {

@@ -60,6 +60,9 @@ const std::set<int>& DeniedToAccount(store::CameraAccess kind) {
 std::set<int> IdsUnder(const Json::Value& priv_data, const char* member) {
     std::set<int> cameras;
     for (const Json::Value& camera : priv_data[member]) {
+        if (!camera.isInt()) {  // asInt would take null, true or 3.5 for some other camera
+            throw Json::LogicError(std::string("privData names a camera by no number: ") + member);
+        }
         cameras.insert(camera.asInt());
     }
     return cameras;

@@ -83,6 +83,9 @@ void RequestContext::NoteStream() {
 
 void LogFailure(const char* name, const std::exception& error) {
     base::LogError(std::string(name) + ": " + error.what());
+    if (dynamic_cast<const store::StoreError*>(&error) != nullptr) {
+        RequestContext::Current().NoteStoreFailure();
+    }
 }
 
 }  // namespace lookhaven::binding

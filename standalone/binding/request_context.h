@@ -19,6 +19,7 @@
 #include "platform/export.h"
 #include "standalone/base/installation.h"
 #include "standalone/binding/output.h"
+#include "standalone/binding/send_queue.h"
 #include "standalone/control/demand.h"
 #include "standalone/ring/stream.h"
 #include "standalone/store/mounts.h"
@@ -74,6 +75,9 @@ class LH_PLATFORM_API RequestContext {
     // Throws std::logic_error before Begin.
     const base::Installation& Installation() const;
     Output* output() const { return output_; }
+    // What of the output is still on its way to the viewer; null when nobody knows. Borrowed like the output.
+    SendQueue* Queue() const { return queue_; }
+    void SetQueue(SendQueue* queue) { queue_ = queue; }
 
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
@@ -116,6 +120,10 @@ class LH_PLATFORM_API RequestContext {
     // The camera is denied to the caller, who must not be able to tell it from one that does not exist.
     void NoteHidden() { is_hidden_ = true; }
 
+    // The store has failed, so what the module takes for an empty list or a missing record is none.
+    void NoteStoreFailure() { has_store_failed_ = true; }
+    bool HasStoreFailed() const { return has_store_failed_; }
+
     // The ring entry that was read last and not given back; null when there is none.
     const ring::Entry* HeldEntry() const { return held_entry_; }
     void SetHeldEntry(const ring::Entry* entry) { held_entry_ = entry; }
@@ -123,6 +131,7 @@ class LH_PLATFORM_API RequestContext {
   private:
     std::optional<base::Installation> installation_;
     Output* output_ = nullptr;
+    SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
     KnownRecords known_;
@@ -134,14 +143,16 @@ class LH_PLATFORM_API RequestContext {
     bool is_stream_ = false;
     bool wants_picture_ = false;
     bool is_hidden_ = false;
+    bool has_store_failed_ = false;
     const ring::Entry* held_entry_ = nullptr;
 };
 
-// Writes "name: what" to the log.
+// Writes "name: what" to the log, and notes a failure of the store.
 void LogFailure(const char* name, const std::exception& error);
 
 // The result of ask, or failure when it throws; the exception is logged under the name. For calls that can tell the
-// module nothing but success or failure.
+// module nothing but success or failure. Where it was the store that failed, the request fails, whatever the module
+// answers.
 template <typename Result, typename Ask>
 Result OrFailure(const char* name, Result failure, Ask&& ask) {
     try {

@@ -167,19 +167,24 @@ Findings CheckHost(const base::Installation& installation) {
 }
 
 Findings CheckRecorder(const base::Installation& installation) {
-    control::CommonConfig* config = control::MapCommonConfig(installation);
-    if (config != nullptr && control::IsRecorderAlive(*config)) {
+    const control::RecorderState state = control::FindRecorder(installation);
+    if (state == control::RecorderState::kAlive) {
         return {};
     }
-    return {{config == nullptr ? "the recorder has not run since the machine started" : "the recorder does not run",
+    if (state == control::RecorderState::kHangs) {
+        return {
+            {"the recorder hangs: nothing is recorded or shown live, and what it last told of the cameras is stale",
+             "let it go on if somebody stopped it (pkill -CONT -f lookhaven-recorder), or else restart the server"}};
+    }
+    return {{control::MapCommonConfig(installation) == nullptr ? "the recorder has not run since the machine started"
+                                                               : "the recorder does not run",
              "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
 }
 
 // What the recorder reports of each camera.
 Findings CheckRecordings(const base::Installation& installation) {
-    control::CommonConfig* config = control::MapCommonConfig(installation);
-    if (config == nullptr || !control::IsRecorderAlive(*config)) {
-        return {};
+    if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
+        return {};  // stale
     }
     Findings findings;
     for (const maintenance::RecordingStatus& state : maintenance::ReadRecordingStatus(installation)) {

@@ -7,14 +7,16 @@
 #include <system_error>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/process.h"
 #include "standalone/control/shared_mutex.h"
 
 namespace lookhaven::control {
 
-// The file: the record, and the boot of the machine that it belongs to.
+// The file: the record, the boot of the machine that it belongs to, and the recorder that refreshes it.
 struct CommonConfigFile {
     CommonConfig config;
     std::array<char, 36> boot;
+    base::ProcessIdentity recorder;
 };
 
 namespace {
@@ -56,7 +58,9 @@ Table FindOrMakeRecord(const std::filesystem::path& path) {
 }  // namespace
 
 CommonConfigKeeper::CommonConfigKeeper(const base::Installation& installation)
-    : table_(FindOrMakeRecord(PathOf(installation))) {}
+    : table_(FindOrMakeRecord(PathOf(installation))) {
+    table_->recorder = base::ThisProcess();
+}
 
 bool CommonConfigKeeper::Refresh(bool paused) {
     CommonConfig& config = table_->config;
@@ -74,6 +78,16 @@ CommonConfig* MapCommonConfig(const base::Installation& installation) try {
     return table ? &table->Release()->config : nullptr;
 } catch (const std::system_error&) {
     return nullptr;
+}
+
+RecorderState FindRecorder(const base::Installation& installation) try {
+    const std::optional<Table> table = FindRecord(PathOf(installation));
+    if (table && IsRecorderAlive((*table)->config)) {
+        return RecorderState::kAlive;
+    }
+    return table && base::IsAlive((*table)->recorder) ? RecorderState::kHangs : RecorderState::kNone;
+} catch (const std::system_error&) {
+    return RecorderState::kNone;
 }
 
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec) {

@@ -42,6 +42,13 @@ class CommonConfigKeeper {
 // again.
 CommonConfig* MapCommonConfig(const base::Installation& installation);
 
+enum class RecorderState {
+    kNone,   // none runs
+    kHangs,  // its process is there, but has not refreshed the record for five seconds
+    kAlive,
+};
+RecorderState FindRecorder(const base::Installation& installation);
+
 // The record was refreshed at most max_age_sec ago. May wait a second for the lock, and is false without it.
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec = 5);
 

@@ -1,11 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/control/progress_file.h"
 
-#include <array>
 #include <atomic>
 #include <cerrno>
 #include <chrono>
-#include <stdexcept>
 #include <string>
 #include <thread>
 
@@ -20,8 +18,8 @@ constexpr pid_t kSwept = -1;
 constexpr int kAttempts = 5;
 constexpr std::chrono::milliseconds kPause{1};
 
-std::filesystem::path PathOf(const std::filesystem::path& folder, std::int64_t key) {
-    return folder / std::to_string(key);
+std::filesystem::path PathOf(const std::filesystem::path& folder, std::int64_t key, std::string_view session) {
+    return folder / std::to_string(key).append(".").append(session);
 }
 
 struct Unlinked {
@@ -35,34 +33,27 @@ struct ProgressFile::Record {
     std::uint32_t magic;
     std::atomic<pid_t> owner;
     std::atomic<int> value;
-    std::array<char, 64> session;
 };
 
 std::optional<ProgressFile> ProgressFile::Open(const std::filesystem::path& folder, std::int64_t key,
                                                std::string_view session) {
-    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key));
+    std::optional<MappedTable<Record>> record = MappedTable<Record>::Open(PathOf(folder, key, session));
     if (!record) {
         return std::nullopt;
     }
     const pid_t owner = (*record)->owner;
-    if ((*record)->magic != kMagic || owner == kSwept || session != std::string_view((*record)->session.data())) {
+    if ((*record)->magic != kMagic || owner == kSwept) {
         return std::nullopt;
     }
     return ProgressFile(*std::move(record), owner);
 }
 
 // Makes the file under a name of its own, to be linked to the key's name once complete.
-void ProgressFile::Prepare(const std::filesystem::path& path, std::string_view session) {
+void ProgressFile::Prepare(const std::filesystem::path& path) {
     const auto table = MappedTable<Record>::OpenOrCreate(path);
-    Record& record = *table;
-    if (session.size() >= record.session.size()) {
-        throw std::invalid_argument("a session handle is too long");
-    }
-    record.magic = kMagic;
-    record.owner = ::getpid();
-    record.value = kUnset;
-    record.session.fill('\0');
-    session.copy(record.session.data(), session.size());
+    table->magic = kMagic;
+    table->owner = ::getpid();
+    table->value = kUnset;
 }
 
 bool ProgressFile::TakeOver() {
@@ -76,12 +67,12 @@ bool ProgressFile::TakeOver() {
 
 std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folder, std::int64_t key,
                                               std::string_view session) {
-    const std::filesystem::path path = PathOf(folder, key);
+    const std::filesystem::path path = PathOf(folder, key, session);
     std::filesystem::create_directories(folder);
     std::filesystem::path fresh = path;
     fresh += "." + std::to_string(::getpid()) + ".new";
     const Unlinked remove_at_end{fresh};
-    Prepare(fresh, session);
+    Prepare(fresh);
     // The key may just be swept, which is over in a moment.
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
         if (::link(fresh.c_str(), path.c_str()) != 0 && errno != EEXIST) {
@@ -95,8 +86,8 @@ std::optional<ProgressFile> ProgressFile::Own(const std::filesystem::path& folde
     return std::nullopt;
 }
 
-void ProgressFile::Sweep(const std::filesystem::path& folder, std::int64_t key, pid_t owner) {
-    const std::filesystem::path path = PathOf(folder, key);
+void ProgressFile::Sweep(const std::filesystem::path& folder, std::int64_t key, std::string_view session, pid_t owner) {
+    const std::filesystem::path path = PathOf(folder, key, session);
     const auto record = MappedTable<Record>::Open(path);
     if (record && (*record)->owner.compare_exchange_strong(owner, kSwept)) {
         ::unlink(path.c_str());

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One number that a player shares with its client's other requests: a small mapped file for each stream key.
+// One number that a player shares with its client's other requests: a small mapped file for each session and stream key.
 //
 // Why so        Both sides may be killed at any point, and the host sweeps what they leave while a new player takes the
 //               same key. So nobody locks: the file holds its owner's process id, which changes by compare and swap.
-// Invariants    (1) A file appears under its name complete. (2) The session in it never changes.
-//               (3) Once its owner is kSwept the file is removed, and nobody takes it over any more.
+// Invariants    (1) A file appears under its name complete.
+//               (2) Once its owner is kSwept the file is removed, and nobody takes it over any more.
 // Thread safety Any process; one thread per object.
 #pragma once
 
@@ -24,16 +24,16 @@ class ProgressFile {
   public:
     static constexpr int kUnset = -1;
 
-    // Makes the calling process the owner of the key, with no number set; creates the folder if it is missing. Nothing
-    // when the key is another session's. Throws std::system_error; std::invalid_argument for a session that is too
-    // long.
+    // Makes the calling process the owner of the session's key, with no number set; creates the folder if it is missing.
+    // session: its handle, here and below. Nothing when others take and leave the key all the time. Throws
+    // std::system_error.
     static std::optional<ProgressFile> Own(const std::filesystem::path& folder, std::int64_t key,
                                            std::string_view session);
-    // Nothing when there is no such key, or it is another session's.
+    // Nothing when the session has no such key.
     static std::optional<ProgressFile> Open(const std::filesystem::path& folder, std::int64_t key,
                                             std::string_view session);
     // Removes the key's file when the process owns it.
-    static void Sweep(const std::filesystem::path& folder, std::int64_t key, pid_t owner);
+    static void Sweep(const std::filesystem::path& folder, std::int64_t key, std::string_view session, pid_t owner);
 
     // Both are false for good once the file has another owner than when this object was made.
     bool Set(int value);
@@ -45,7 +45,7 @@ class ProgressFile {
     struct Record;
     ProgressFile(MappedTable<Record> record, pid_t owner) : record_(std::move(record)), owner_(owner) {}
 
-    static void Prepare(const std::filesystem::path& path, std::string_view session);
+    static void Prepare(const std::filesystem::path& path);
     bool TakeOver();
 
     MappedTable<Record> record_;

@@ -10,7 +10,6 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
-#include "standalone/control/shared_mutex.h"
 
 namespace lookhaven::control {
 
@@ -25,7 +24,7 @@ namespace {
 constexpr int kSerialShift = 9;
 
 bool IsPlayerOf(const Slot& slot, std::string_view session) {
-    return slot.serial != 0 && slot.player.started_us != 0 && SessionOf(slot) == session;
+    return slot.serial != 0 && slot.player.key != 0 && SessionOf(slot) == session && !slot.MustEnd();
 }
 
 }  // namespace
@@ -61,6 +60,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->pairing = 0;
     slot->work = Work::kNone;
     slot->player.started_us = 0;
+    slot->player.key = 0;
     slot->player.is_excess = false;
     slot->player.paused = false;
     slot->player.pause = PackPause(++last_serial_, {});
@@ -177,12 +177,15 @@ std::optional<SlotUse> SlotTable::FindPlayer(std::string_view session, std::int6
     std::optional<SlotUse> found;
     for (Slot& slot : slots_) {
         const SlotUse use{&slot, slot.serial};
-        if (IsPlayerOf(slot, session) && slot.player.key == key &&
-            (!found || slot.player.started_us > found->slot->player.started_us)) {
+        if (IsPlayerOf(slot, session) && slot.player.key == key && (!found || use.serial > found->serial)) {
             found = use;
         }
     }
     return found;
+}
+
+SharedLock SlotTable::LockPlayers() const {
+    return TryLock(guard_->mutex);
 }
 
 std::uint64_t SlotTable::PackPause(std::uint64_t serial, const Pause& pause) {
@@ -194,17 +197,16 @@ Pause SlotTable::UnpackPause(std::uint64_t word) {
     return {(word & 1) != 0, static_cast<std::int8_t>(word >> 1 & 0xff)};
 }
 
-std::optional<Pause> SlotTable::ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change) {
+bool SlotTable::ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change) {
     std::atomic<std::uint64_t>& word = player.slot->player.pause;
     for (std::uint64_t held = word; held >> kSerialShift == player.serial;) {
-        const Pause before = UnpackPause(held);
-        Pause after = before;
-        change(after);
-        if (word.compare_exchange_weak(held, PackPause(player.serial, after))) {
-            return before;
+        Pause pause = UnpackPause(held);
+        change(pause);
+        if (word.compare_exchange_weak(held, PackPause(player.serial, pause))) {
+            return true;
         }
     }
-    return std::nullopt;
+    return false;
 }
 
 std::set<std::string> SlotTable::SessionsWithPlayers() const {
@@ -223,7 +225,7 @@ std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newe
     for (Slot& slot : slots_) {
         if (slot.serial != 0 && slot.pid == newest && SessionOf(slot) == session) {
             owner = &slot;
-        } else if (IsPlayerOf(slot, session)) {
+        } else if (IsPlayerOf(slot, session) && slot.player.started_us != 0) {
             others.push_back(&slot);
         }
     }
@@ -232,7 +234,8 @@ std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newe
     }
     std::sort(others.begin(), others.end(),
               [](const Slot* left, const Slot* right) { return left->player.started_us > right->player.started_us; });
-    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(owner->player.max_players - 1));
+    const int places = owner->player.max_players - (owner->MustEnd() ? 0 : 1);
+    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(places));
     others.erase(others.begin(), others.begin() + static_cast<std::ptrdiff_t>(staying));
     return others;
 }

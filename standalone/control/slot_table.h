@@ -6,7 +6,7 @@
 //               whose session it serves, and only the host's watcher process knows which sessions have ended.
 // Invariants    (1) Only the host takes and frees slots; a free slot belongs to nobody.
 //               (2) A session handle is written once per use of a slot, before has_session is set; what a player can
-//                   do, before started_us is set.
+//                   do, before its key is set.
 //               (3) Other requests only store what they request of a player; only the host signals it.
 //               (4) What one request stores for another carries the serial of the request that it is meant for, so it
 //                   never reaches a later one in the same slot.
@@ -30,6 +30,7 @@
 #include <sys/types.h>
 
 #include "standalone/base/file_descriptor.h"
+#include "standalone/control/shared_mutex.h"
 
 namespace lookhaven::control {
 
@@ -42,7 +43,7 @@ struct Pause {
 // A request process that plays recordings.
 struct Player {
     std::atomic<std::int64_t> started_us;  // monotonic, once its player file is written; 0: no player
-    std::atomic<std::int64_t> key;         // the client's
+    std::atomic<std::int64_t> key;         // the client's; 0: no player, nor about to become one
     bool takes_rate;                       // its progress file carries the rate …
     bool tells_position;                   // … or the position
     bool can_pause;                        // at rate 1 and slower
@@ -121,15 +122,18 @@ class SlotTable {
 
     // For a request process: from now on it is a player, and older players of the session may have to end.
     void BeginPlayer(Slot& slot, std::int64_t key);
-    // The session's newest player under the key.
+    // The session's newest player under the key, which may still be opening its recording, but not one that must end.
     std::optional<SlotUse> FindPlayer(std::string_view session, std::int64_t key) const;
-    // Lets change alter what is requested of the player, in one step, which may call it several times; returns what it
-    // was before. Nothing when the player's request is over.
-    static std::optional<Pause> ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change);
+    // Held by requests while they change more than one thing of a player, whose rate is in its progress file and whose
+    // pause is in its slot. Null after a second.
+    SharedLock LockPlayers() const;
+    // Lets change alter what is requested of the player, in one step, which may call it several times. False when the
+    // player's request is over.
+    static bool ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change);
     static Pause PauseOf(const Slot& slot) { return UnpackPause(slot.player.pause); }
     std::set<std::string> SessionsWithPlayers() const;
     // The players that must end once the session's player file names that process: all others but the newest, as many
-    // as its limit leaves. None when the process is not one of the session.
+    // as its limit leaves; those that must end anyway do not count. None when the process is not one of the session.
     std::vector<Slot*> ExcessPlayers(std::string_view session, pid_t newest) const;
     // Makes the host look at its players and at the processes that must end.
     void Wake();

@@ -2,8 +2,12 @@
 #include "standalone/host/child.h"
 
 #include <csignal>
+#include <cstdlib>
 #include <exception>
+#include <filesystem>
 #include <string>
+#include <system_error>
+#include <vector>
 
 #include <sys/prctl.h>
 #include <unistd.h>
@@ -16,13 +20,22 @@ namespace {
 
 constexpr int kWakeDescriptor = 3;
 
-// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range.
+// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range; there may be
+// a thousand million numbers to try then, so it looks which are open.
 void CloseFrom(int first) {
     if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
         return;
     }
-    for (int descriptor = first; descriptor < static_cast<int>(::sysconf(_SC_OPEN_MAX)); ++descriptor) {
-        ::close(descriptor);
+    std::vector<int> open;
+    std::error_code error;
+    for (auto at = std::filesystem::directory_iterator("/proc/self/fd", error);
+         at != std::filesystem::directory_iterator(); at.increment(error)) {
+        open.push_back(std::atoi(at->path().filename().c_str()));
+    }
+    for (const int descriptor : open) {
+        if (descriptor >= first) {
+            ::close(descriptor);
+        }
     }
 }
 

@@ -80,10 +80,12 @@ Listener::Listener(const std::filesystem::path& path) {
     file_ = FileAt(path);
 }
 
-Listener::~Listener() {
-    if (!path_.empty() && file_ && FileAt(path_) == file_) {
+// The file goes first: as long as the socket is open, no other file gets the number by which this one is known.
+void Listener::Close() {
+    if (socket_ && file_ && FileAt(path_) == file_) {
         ::unlink(path_.c_str());
     }
+    socket_.Reset();
 }
 
 }  // namespace lookhaven::host

@@ -17,17 +17,20 @@ namespace lookhaven::host {
 // Makes descriptors 0, 1 and 2 exist, so that no other file ever gets these numbers.
 void OpenStandardDescriptors();
 
-// A socket file of its own is open to user and group, replaces one that nobody listens on, and is removed at the end.
+// A socket file of its own is open to user and group, replaces one that nobody listens on, and is removed when the socket
+// is closed, unless a successor has replaced it.
 class Listener {
   public:
     // Takes descriptor 3 when LISTEN_PID and LISTEN_FDS say that it was handed over, else listens on the path. Throws
     // std::system_error, or std::runtime_error when somebody listens on the path already.
     explicit Listener(const std::filesystem::path& path);
-    ~Listener();
+    ~Listener() { Close(); }
     Listener(const Listener&) = delete;
     Listener& operator=(const Listener&) = delete;
 
-    base::FileDescriptor TakeSocket() { return std::move(socket_); }
+    // -1 once closed.
+    int Socket() const { return socket_.Get(); }
+    void Close();
     std::string Name() const { return path_.empty() ? "a socket handed over" : path_.string(); }
 
   private:

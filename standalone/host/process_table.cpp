@@ -23,6 +23,8 @@ namespace lookhaven::host {
 namespace {
 
 constexpr std::chrono::milliseconds kPendingSignal{5};
+// A client that seeks closes one stream and opens the next; the end of the one may be seen after the start of the other.
+constexpr std::chrono::milliseconds kSeek{50};
 
 void Signal(const base::FileDescriptor& pidfd, int number) {
     ::syscall(SYS_pidfd_send_signal, pidfd.Get(), number, nullptr, 0);
@@ -111,25 +113,34 @@ void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {
     control::SweepPlayerFile(control::SessionOf(slot), pid);
     if (slot.player.started_us != 0) {
         try {
-            control::ProgressFile::Sweep(progress_folder_, slot.player.key, pid);
+            control::ProgressFile::Sweep(progress_folder_, slot.player.key, control::SessionOf(slot), pid);
         } catch (const std::exception& error) {
             base::LogError(std::string("cannot sweep a progress file: ") + error.what());
         }
     }
 }
 
-bool ProcessTable::SignalExcess() {
-    bool again = false;
+// Returns when to look again.
+Clock::time_point ProcessTable::SignalExcess(Clock::time_point now) {
+    Clock::time_point next = Clock::time_point::max();
     for (const std::string& session : slots_.SessionsWithPlayers()) {
-        for (const control::Slot* slot : slots_.ExcessPlayers(session, control::ReadPlayerFile(session))) {
-            if (const auto found = processes_.find(slot->pid); found != processes_.end()) {
+        const auto newest = processes_.find(control::ReadPlayerFile(session));
+        if (newest == processes_.end() || newest->second.slot->player.started_us == 0) {
+            continue;
+        }
+        const std::chrono::microseconds started(newest->second.slot->player.started_us);
+        for (const control::Slot* slot : slots_.ExcessPlayers(session, newest->first)) {
+            const auto found = processes_.find(slot->pid);
+            if (const auto due = Clock::time_point(started) + kSeek; now < due) {
+                next = std::min(next, due);
+            } else if (found != processes_.end()) {
                 found->second.slot->player.is_excess = true;
                 Signal(found->second.pidfd, SIGUSR1);
-                again = true;
+                next = std::min(next, now + limits_.repeat);
             }
         }
     }
-    return again;
+    return next;
 }
 
 bool ProcessTable::SignalPauses() {
@@ -153,7 +164,7 @@ void ProcessTable::SignalPlayers(Clock::time_point now) {
     if (now < players_due_) {
         return;
     }
-    players_due_ = SignalExcess() ? now + limits_.repeat : Clock::time_point::max();
+    players_due_ = SignalExcess(now);
     if (SignalPauses()) {
         players_due_ = now + kPendingSignal;
     }

@@ -6,7 +6,8 @@
 //               is to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
-//               (3) SIGUSR1 is sent to a player only while the player file names another process of its session.
+//               (3) SIGUSR1 is sent to a player only while the player file names another process of its session, which
+//                   plays.
 // Thread safety One thread.
 #pragma once
 
@@ -76,7 +77,7 @@ class ProcessTable {
     static void BeginEnding(Process& process);
     void Sweep(pid_t pid, const control::Slot& slot) const;
     void SignalPlayers(Clock::time_point now);
-    bool SignalExcess();
+    Clock::time_point SignalExcess(Clock::time_point now);
     bool SignalPauses();
 
     ProcessLimits limits_;

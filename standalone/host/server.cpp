@@ -54,13 +54,12 @@ base::FileDescriptor BlockSignals() {
 
 }  // namespace
 
-Server::Server(const base::Installation& installation, ChildWork work, base::FileDescriptor listener,
-               const ServerLimits& limits)
+Server::Server(const base::Installation& installation, ChildWork work, Listener& listener, const ServerLimits& limits)
     : work_(std::move(work)),
       limits_(limits),
       slots_(limits.requests),
       processes_(limits.processes, slots_, installation.ProgressFolder()),
-      listener_(std::move(listener)),
+      listener_(listener),
       poll_(::epoll_create1(EPOLL_CLOEXEC)),
       signals_(BlockSignals()) {
     if (!poll_ || !signals_) {
@@ -69,7 +68,7 @@ Server::Server(const base::Installation& installation, ChildWork work, base::Fil
     // What the players of a host that was killed have left.
     std::filesystem::remove_all(installation.ProgressFolder());
     control::SweepPlayerFiles();
-    Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
+    Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
     Watch(signals_.Get(), Kind::kSignals, 0, EPOLLIN);
     Watch(slots_.WakeDescriptor(), Kind::kWake, 0, EPOLLIN);
 }
@@ -123,11 +122,11 @@ void Server::Handle(Kind kind, std::uint32_t id) {
 
 void Server::Accept() {
     // Not set non-blocking: the request process gets this very socket. Reading here never waits by MSG_DONTWAIT.
-    base::FileDescriptor socket(::accept4(listener_.Get(), nullptr, nullptr, SOCK_CLOEXEC));
+    base::FileDescriptor socket(::accept4(listener_.Socket(), nullptr, nullptr, SOCK_CLOEXEC));
     if (!socket) {
         if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == ENOBUFS) {
             base::LogError("cannot accept a connection: out of memory, or too many open files");
-            Watch(listener_.Get(), Kind::kListener, 0, 0);
+            Watch(listener_.Socket(), Kind::kListener, 0, 0);
             accept_due_ = Clock::now() + kAcceptAgain;
         }
         return;
@@ -237,7 +236,7 @@ void Server::BeginShutdown() {
     [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
     ending_ = true;
     watcher_due_ = accept_due_ = Clock::time_point::max();
-    listener_.Reset();
+    listener_.Close();
     connections_.clear();
     processes_.EndAll();
 }
@@ -248,7 +247,7 @@ Clock::time_point Server::DoWhatIsDue() {
         StartWatcher();
     }
     if (now >= accept_due_ && !ending_) {
-        Watch(listener_.Get(), Kind::kListener, 0, EPOLLIN);
+        Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
         accept_due_ = Clock::time_point::max();
     }
     Clock::time_point next = std::min({processes_.SendDueSignals(now), watcher_due_, accept_due_});

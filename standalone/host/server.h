@@ -17,6 +17,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
 #include "standalone/host/child.h"
+#include "standalone/host/listener.h"
 #include "standalone/host/process_table.h"
 #include "standalone/host/scgi.h"
 
@@ -31,10 +32,9 @@ struct ServerLimits {
 
 class Server {
   public:
-    // The listener is a listening stream socket. Removes what players of a killed host left in the installation's
+    // Borrows the listener, and closes it when it stops to serve. Removes what players of a killed host left in the installation's
     // folder of progress files. Blocks all signals of the process. Throws std::system_error.
-    Server(const base::Installation& installation, ChildWork work, base::FileDescriptor listener,
-           const ServerLimits& limits);
+    Server(const base::Installation& installation, ChildWork work, Listener& listener, const ServerLimits& limits);
 
     // Serves until SIGTERM or SIGINT, then ends the request processes and returns when the last is gone.
     void Run();
@@ -66,7 +66,7 @@ class Server {
     control::SlotTable slots_;
     ProcessTable processes_;
     std::map<int, Connection> connections_;
-    base::FileDescriptor listener_;
+    Listener& listener_;
     base::FileDescriptor poll_;
     base::FileDescriptor signals_;
     base::FileDescriptor watcher_;  // pidfd

@@ -20,8 +20,9 @@ Codec VideoCodecNamed(std::string_view name) {
 
 class Library : public DecoderLibrary {
   public:
-    std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const override {
-        return JpegOfKeyFrame(VideoCodecNamed(codec), frame);
+    std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame,
+                                    std::size_t max_bytes) const override {
+        return JpegOfKeyFrame(VideoCodecNamed(codec), frame, max_bytes);
     }
     std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const override {
         return OpenFrameDecoder(VideoCodecNamed(codec), threads);

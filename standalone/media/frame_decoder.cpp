@@ -101,7 +101,7 @@ class AvFrameDecoder : public FrameDecoder {
 
 }  // namespace
 
-AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads) {
+AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads, int halvings) {
     PrepareAv();
     const AVCodecID id = codec == Codec::kH264   ? AV_CODEC_ID_H264
                          : codec == Codec::kH265 ? AV_CODEC_ID_HEVC
@@ -114,6 +114,7 @@ AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads) {
     context->thread_count = threads;
     context->thread_type = FF_THREAD_FRAME;
     context->max_pixels = std::int64_t{base::kMaxSidePixels} * base::kMaxSidePixels;
+    context->lowres = halvings;
     const base::BlockedSignals blocked;
     CheckAv(avcodec_open2(context.get(), decoder, nullptr), "cannot open the decoder");
     return context;

@@ -44,7 +44,8 @@ class DecoderLibrary {
     // codec: a name as base::CodecName gives it.
 
     // As JpegOfKeyFrame in still.h.
-    virtual std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame) const = 0;
+    virtual std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame,
+                                            std::size_t max_bytes) const = 0;
     // Each thread beyond the first delays pictures by one more frame, so use one thread at the end of a growing
     // recording. Throws SourceError for a codec that cannot be decoded.
     virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const = 0;

@@ -96,6 +96,7 @@ int MatroskaOutput::WriteBytes(void* self, std::uint8_t* data, int size) {
         output.errno_ = output.errno_ == 0 ? errno : output.errno_;
         return AVERROR(output.errno_);
     }
+    output.bytes_written_ += size;
     return size;
 }
 

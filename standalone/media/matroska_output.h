@@ -33,6 +33,9 @@ class MatroskaOutput {
     void Flush();
     void End();
 
+    // To the descriptor, all in all.
+    std::int64_t BytesWritten() const { return bytes_written_; }
+
   private:
     struct FreeContext {
         void operator()(AVFormatContext* context) const { avformat_free_context(context); }
@@ -48,6 +51,7 @@ class MatroskaOutput {
 
     int descriptor_;
     int errno_ = 0;  // of the first write that failed
+    std::int64_t bytes_written_ = 0;
     std::unique_ptr<AVIOContext, FreeIo> io_;
     std::unique_ptr<AVFormatContext, FreeContext> context_;
     AvPtr<AVPacket> packet_;

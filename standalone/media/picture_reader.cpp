@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/media/picture_reader.h"
 
+#include <algorithm>
 #include <string>
 
 #include "standalone/media/source.h"
@@ -20,7 +21,7 @@ std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
     if (codec == "MJPEG") {
         const archive::FrameEntry& entry = recording_.Entries(frame.segment)[frame.entry];
         if (entry.size > buffer.size()) {
-            throw SourceError("a picture of " + std::to_string(entry.size) + " bytes is too large");
+            return ReadSmaller(frame.segment, entry, buffer);
         }
         recording_.ReadBytes(frame.segment, entry, buffer.first(entry.size));
         return entry.size;
@@ -35,6 +36,15 @@ std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
         Decode(frame.entry);
     }
     return decoder_->Encode(buffer);
+}
+
+std::size_t PictureReader::ReadSmaller(std::uint32_t segment, const archive::FrameEntry& entry,
+                                       std::span<std::uint8_t> buffer) {
+    bytes_.resize(entry.size);
+    recording_.ReadBytes(segment, entry, bytes_);
+    const std::vector<std::uint8_t> jpeg = LoadDecoderLibrary().Still("MJPEG", bytes_, buffer.size());
+    std::copy(jpeg.begin(), jpeg.end(), buffer.begin());
+    return jpeg.size();
 }
 
 // Positions the decoder at or before the entry, as close to it as possible.

@@ -25,11 +25,12 @@ class PictureReader {
     // The recording must outlive the reader; it may be refreshed between calls.
     explicit PictureReader(const archive::RecordingReader& recording) : recording_(recording) {}
 
-    // Stores the picture of a valid index in the buffer and returns its size. Throws SourceError when it cannot be
-    // decoded or does not fit, archive::ArchiveError, std::system_error.
+    // Stores the picture of a valid index in the buffer and returns its size. One of Motion JPEG that does not fit is
+    // encoded again, with shorter sides where needed. Throws SourceError when it cannot be decoded or does not fit, archive::ArchiveError, std::system_error.
     std::size_t Read(int index, std::span<std::uint8_t> buffer);
 
   private:
+    std::size_t ReadSmaller(std::uint32_t segment, const archive::FrameEntry& entry, std::span<std::uint8_t> buffer);
     void Seek(std::uint32_t segment, std::uint32_t entry);
     void Decode(std::uint32_t entry);
 

@@ -45,7 +45,7 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
         supervisor.Step();
     }
     if (!supervisor.Finish(kFinishLimit)) {
-        base::LogWarning("stopped while the store was still blocked");
+        base::LogWarning("stopped while the store or a disk was still blocked");
         ::_exit(EX_OK);
     }
     base::LogInfo("stopped");

@@ -21,9 +21,11 @@ constexpr std::int64_t kRetentionUs = 10'000'000;
 
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit)
-    : installation_(installation),
-      no_data_limit_(no_data_limit),
+    : no_data_limit_(no_data_limit),
       flush_requests_(installation),
+      report_([&installation](const RecordingReport::States& states) {
+          maintenance::WriteRecordingStatus(installation, states);
+      }),
       rows_(installation.StoreUrl()),
       maintenance_(installation.StoreUrl(), "maintain the recordings",
                    [this](store::Store& store, const std::stop_token&) { Maintain(store); }) {}
@@ -41,6 +43,7 @@ std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogCont
 }
 
 void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
+    const std::size_t cameras = entries_.size();
     const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
     std::erase_if(entries_,
                   [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
@@ -71,6 +74,9 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         entry.stream = {camera, plan.stream};
         entry.worker->SetRequest({plan, marked.contains(camera) ? marked.at(camera) : 0});
     }
+    if (entries_.size() > cameras) {
+        rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its number
+    }
     AnswerFlushes();
 }
 
@@ -93,14 +99,7 @@ void RecordingSupervisor::DoEverySecond() {
     for (const auto& [camera, entry] : entries_) {
         states.push_back(entry.worker->State());
     }
-    try {
-        if (states != published_) {
-            maintenance::WriteRecordingStatus(installation_, states);
-            published_ = std::move(states);
-        }
-    } catch (const std::exception& failure) {
-        base::LogWarning(failure.what());
-    }
+    report_.Publish(std::move(states));
 }
 
 std::vector<control::LiveStream> RecordingSupervisor::NeededStreams() const {
@@ -122,6 +121,7 @@ std::shared_ptr<FrameQueue> RecordingSupervisor::QueueOf(control::LiveStream str
 
 void RecordingSupervisor::RequestStop() {
     maintenance_.RequestStop();
+    report_.RequestStop();
     for (auto& [camera, entry] : entries_) {
         entry.is_ending = true;
         entry.worker->RequestStop();
@@ -135,7 +135,7 @@ bool RecordingSupervisor::HasEnded() {
     if (!std::exchange(stores_last_rows_, true)) {
         rows_.RequestStop();
     }
-    return rows_.HasEnded() && maintenance_.HasEnded();
+    return rows_.HasEnded() && maintenance_.HasEnded() && report_.HasEnded();
 }
 
 void RecordingSupervisor::Maintain(store::Store& store) {

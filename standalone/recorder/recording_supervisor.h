@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "standalone/recorder/recording_report.h"
 #include "standalone/recorder/recording_worker.h"
 
 namespace lookhaven::recorder {
@@ -49,9 +50,9 @@ class RecordingSupervisor {
     template <class Work>
     void TryOn(const store::Mount& mount, const std::string& purpose, Work&& work);
 
-    const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
+    RecordingReport report_;
     EventRowQueue rows_;
     std::atomic<bool> needs_space_ = true;
     std::set<int> recovered_mounts_;                        // only the maintenance thread uses it
@@ -59,7 +60,6 @@ class RecordingSupervisor {
     std::map<std::string, std::string> reported_failures_;  // likewise; by purpose
     StoreThread maintenance_;
     std::map<int, Entry> entries_;
-    std::vector<maintenance::RecordingStatus> published_;
     bool stores_last_rows_ = false;
 };
 

@@ -17,6 +17,7 @@ namespace {
 
 constexpr std::chrono::milliseconds kPollWhileEnding{20};
 constexpr int kOrphanSearchSeconds = 60;
+constexpr std::int64_t kStandstillUs = 3'000'000;
 
 }  // namespace
 
@@ -65,7 +66,12 @@ std::chrono::milliseconds Supervisor::TimeToNextStep() const {
 }
 
 void Supervisor::DoEverySecond() {
-    next_second_us_ = base::MonotonicMicros() + 1'000'000;
+    const std::int64_t now_us = base::MonotonicMicros();
+    if (next_second_us_ != 0 && now_us - next_second_us_ > kStandstillUs) {
+        base::LogWarning("the recorder stood still for " + std::to_string((now_us - next_second_us_) / 1'000'000) +
+                         " s, of which nothing is recorded: it was stopped, or the machine is overloaded");
+    }
+    next_second_us_ = now_us + 1'000'000;
     const bool refreshed = common_config_.Refresh(false);
     if (refreshed != std::exchange(common_config_refreshed_, refreshed)) {
         refreshed ? base::LogInfo("the common record is fresh again")

@@ -82,7 +82,7 @@ void Run(const Options& options) {
         .serve_request = [&service](http::Request& request, control::SlotTable& slots,
                                     control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },
         .watch_sessions = [&installation](control::SlotTable& slots) { api::WatchSessions(installation, slots); }};
-    host::Server server(installation, work, listener.TakeSocket(), options.limits);
+    host::Server server(installation, work, listener, options.limits);
     base::LogInfo("serving on " + listener.Name());
     server.Run();
 }

@@ -147,6 +147,18 @@ TEST_F(Admission, AStoreThatCannotBeWrittenStillServesWhoIsLoggedIn) {
     EXPECT_EQ(status, 200);
 }
 
+TEST_F(Admission, AStoreThatFailsIsNeverAnEmptyList) {
+    store::Store records = store::Store::Open(host_.Home().StoreUrl());
+    const std::string search = "api=Test&version=1&method=Search";
+    EXPECT_EQ(Status(search, true), 200);
+    for (const char* table : {"events", "sessions"}) {
+        records.connection().Write([table](soci::session& sql) { sql << "drop table " << table; });
+        const host::Answer answer = host_.Ask(search, admin_);
+        EXPECT_EQ(answer.status, 500) << table;
+        EXPECT_NE(answer.body.find("the record store cannot be read"), std::string::npos) << answer.body;
+    }
+}
+
 TEST_F(Admission, SlowsDownGuessingOfAnAddressOrAnIpv6Network) {
     const auto attempt = [this](const std::string& address, const std::string& password = "wrong") {
         return Status("api=VEXO.Auth&version=1&method=Login", false, "account=admin&password=" + password,
@@ -180,6 +192,7 @@ TEST_F(Admission, RestrictionsThatAreNotUnderstoodAreRefused) {
         EXPECT_EQ(Status(success + good, true), 200) << good;
     }
     for (const char* bad : {"1", "text", "[1]", "", R"({"deniedCameras":5})", R"({"deniedCameras":["1x"]})",
+                            R"({"deniedCameras":[null]})", R"({"deniedCameras":[true]})", R"({"deniedAudio":[1.5]})",
                             R"({"deniedAudio":{"1":2}})", R"({"deniedDoors":[1]})", R"({"privilege":"2"})"}) {
         EXPECT_EQ(Status(success + bad, true), 400) << bad;
     }

@@ -172,10 +172,10 @@ TEST_F(Playback, IsForPlayersOfTheOwnSession) {
                                            {"Stop", "timestamp=7"}}) {
             EXPECT_EQ(Ask(method, form, other).status, 404) << account << ' ' << method;
         }
-        // Its own player under the same key goes on, without reaching the other's number.
-        Player own(host_, other, "PlayMjpegEvent&timestamp=7&playrate=8");
-        EXPECT_TRUE(own.Tell("rate"));
-        EXPECT_EQ(Ask("SetRate", "timestamp=7&rate=3", other).status, 409);
+        // Its own player under the same key is another one.
+        Player own(host_, other, "PlayMjpegEventNoFrameId&timestamp=7");
+        EXPECT_TRUE(own.Tell("rate")) << "ends when its number is not its own";
+        EXPECT_EQ(Ask("GetPosition", "timestamp=7", other).status, 200);
     }
     EXPECT_EQ(player.Tell("rate"), 1);
     EXPECT_EQ(player.Tell("paused"), 0);
@@ -201,6 +201,30 @@ TEST_F(Playback, StandsStillWhilePausedAndResumesItsRate) {
         EXPECT_EQ(Ask("Pause", std::string("timestamp=7&on=") + (i % 2 == 0 ? "true" : "false")).status, 200);
     }
     EXPECT_EQ(player.Tell("paused"), 0);
+}
+
+TEST_F(Playback, WaitsForAPlayerThatIsStillOpening) {
+    const std::string play = "PlayMjpegEventNoFrameId&changerate=1&playrate=4&timestamp=7&opens=";
+    Player older = Play(play + "0");  // a seek: the key is taken over
+    older.Close();
+    Player player(host_, session_.secret, play + "300");
+    ASSERT_TRUE(Eventually(2s, [&] { return Ask("Pause", "timestamp=7&on=true").status != 404; }));
+    EXPECT_TRUE(Eventually(2s, [&] { return player.Tell("rate") == 1; }));
+    EXPECT_EQ(player.Tell("paused"), 1);
+    const Player slow(host_, session_.secret, "PlayMjpegEvent&timestamp=8&opens=3000");
+    ASSERT_TRUE(Eventually(2s, [&] { return Ask("SetRate", "timestamp=8&rate=2").status == 409; }));
+}
+
+TEST_F(Playback, StandsStillWhilePausedWhoeverSetsTheRateMeanwhile) {
+    Player player = Play("PlayMjpegEventNoFrameId&changerate=1&playrate=4&timestamp=7");
+    for (int round = 0; round < 20; ++round) {
+        std::thread other([this] { EXPECT_EQ(Ask("SetRate", "timestamp=7&rate=8").status, 200); });
+        EXPECT_EQ(Ask("Pause", "timestamp=7&on=true").status, 200);
+        other.join();
+        EXPECT_TRUE(Eventually(1s, [&] { return player.Tell("rate") == 1; })) << round;
+        EXPECT_EQ(Ask("Pause", "timestamp=7&on=false").status, 200);
+        EXPECT_TRUE(Eventually(1s, [&] { return player.Tell("rate") == 8; })) << round;
+    }
 }
 
 TEST_F(Playback, HandsOverToTheNewerPlayer) {
@@ -252,6 +276,17 @@ TEST_F(Playback, LetsAsManyPlaySideBySideAsTheSettingSays) {
     for (int key = 3; key <= 5; ++key) {
         EXPECT_EQ(players[static_cast<std::size_t>(key) - 1].Tell("checks"), 0);
         EXPECT_EQ(Ask("CheckOwner", "timestamp=" + std::to_string(key)).Json()["data"]["owner"], true);
+    }
+    for (int key = 6; key <= 15; ++key) {  // seeks in the last: its old stream is closed a moment before or after
+        Player& sought = players.back();
+        if (key % 2 == 0) {
+            sought.Close();
+        }
+        Player next(host_, session_.secret, "PlayMjpegEvent&timestamp=" + std::to_string(key));
+        sought = std::move(next);
+        EXPECT_TRUE(sought.Tell("rate")) << key;
+        EXPECT_EQ(players[2].Tell("checks"), 0) << key;
+        EXPECT_EQ(players[3].Tell("checks"), 0) << key;
     }
 }
 

@@ -119,8 +119,13 @@ TEST_F(CommonConfigTest, IsMissingUntilARecorderMadeItAndThenStaysTheSame) {
     EXPECT_TRUE(restarted.Refresh(false));
     EXPECT_EQ(config->paused, 0) << "a restarted recorder refreshes the record that readers have";
     EXPECT_TRUE(IsRecorderAlive(*config));
+    EXPECT_EQ(FindRecorder(installation_), RecorderState::kAlive);
     config->timestamp_sec -= 6;
     EXPECT_FALSE(IsRecorderAlive(*config));
+    EXPECT_EQ(FindRecorder(installation_), RecorderState::kHangs);
+    KilledChild crashed([&] { CommonConfigKeeper{installation_}; });
+    crashed.Kill();
+    EXPECT_EQ(FindRecorder(installation_), RecorderState::kNone);
 }
 
 TEST_F(CommonConfigTest, ARecordOfAnEarlierBootIsReplacedSinceItsLockMayBeHeldForEver) {

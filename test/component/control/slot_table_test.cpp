@@ -87,7 +87,7 @@ TEST(SlotTable, RequestsForAPlayerDoNotReachItsSuccessor) {
     const SlotUse first = play();
     const auto pause = [](Pause& asked) { asked = {true, -8}; };
     EXPECT_TRUE(SlotTable::ChangePause(first, pause));
-    EXPECT_EQ(SlotTable::ChangePause(first, pause)->resumed_rate, -8);
+    EXPECT_EQ(SlotTable::PauseOf(*first.slot).resumed_rate, -8);
     SlotTable::Free(*first.slot);
     const SlotUse second = play();
     ASSERT_EQ(second.slot, first.slot);

@@ -11,6 +11,7 @@
 #include <sys/wait.h>
 
 #include "standalone/base/process.h"
+#include "standalone/host/listener.h"
 #include "standalone/store/users.h"
 #include "test/support/host/host_under_test.h"
 #include "test/support/host/scgi_bytes.h"
@@ -313,6 +314,19 @@ TEST(Host, TakesItsProcessesAlong) {
             EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
             EXPECT_FALSE(std::filesystem::exists(socket));
         }
+    }
+}
+
+TEST(Host, LeavesItsSuccessorsSocketAlone) {
+    const test::TemporaryFolder folder;
+    const std::filesystem::path path = folder / "socket";
+    Listener old(path);
+    for (int i = 0; i < 50; ++i) {  // a file system may give the next file the number of one that is gone
+        old.Close();
+        EXPECT_FALSE(std::filesystem::exists(path));
+        const Listener successor(path);
+        old.Close();
+        EXPECT_TRUE(std::filesystem::exists(path)) << i;
     }
 }
 

@@ -66,15 +66,20 @@ TEST_F(ExportOf, RecordingsAndSpansToFilesAndPipes) {
         base::FileDescriptor from(ends[0]);
         base::FileDescriptor to(ends[1]);
         std::string received;
+        std::size_t announced = 0;
+        ExportOptions options = row.options;
+        options.announce = [&announced](std::int64_t size_bytes) { announced = static_cast<std::size_t>(size_bytes); };
         std::jthread receiver([&] {
             char block[4096];
             for (ssize_t got = 0; (got = ::read(from.Get(), block, sizeof(block))) > 0;) {
                 received.append(block, static_cast<std::size_t>(got));
             }
         });
-        LoadRemuxLibrary().Copy(path, to.Get(), row.options);
+        LoadRemuxLibrary().Copy(path, to.Get(), options);
         to.Reset();
         receiver.join();
+        EXPECT_EQ(received.size(), announced) << path;
+        EXPECT_LT(received.size(), 2 * std::filesystem::file_size(out_) + 200'000) << path;
         Write(out_, received);
         EXPECT_THAT(Probe(out_), testing::MatchesRegex(row.probed)) << path << ", through a pipe";
     }
@@ -91,7 +96,10 @@ TEST_F(ExportOf, NothingAndToNobodyFails) {
     Record(MakeClip(kMjpeg), folder_ / "1970-01-01/000018-4.mkv", true, SIZE_MAX, kStartMs + 8000);
     archive::WriteSpan(folder_ / "1970-01-01/000010-5.span",
                        {kStartMs, kStartMs + 12'000, {"1970-01-01/000010-1.mkv", "1970-01-01/000018-4.mkv"}});
-    EXPECT_THROW(libav.Copy(folder_ / "1970-01-01/000010-5.span", null.Get(), {}), SourceError) << "two formats";
+    bool is_begun = false;
+    const ExportOptions announced{true, {}, {}, [&is_begun](std::int64_t) { is_begun = true; }};
+    EXPECT_THROW(libav.Copy(folder_ / "1970-01-01/000010-5.span", null.Get(), announced), SourceError);
+    EXPECT_FALSE(is_begun) << "two formats are found while an error can still be told";
     std::filesystem::rename(recording, folder_ / "elsewhere.mkv");
     std::filesystem::create_symlink(folder_ / "elsewhere.mkv", recording);
     EXPECT_THROW(libav.Copy(recording, null.Get(), {}), std::system_error) << "a link";

@@ -9,6 +9,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/media/jpeg.h"
 #include "standalone/media/picture_reader.h"
 #include "standalone/media/source.h"
 #include "test/support/footage/archive_folder.h"
@@ -102,6 +103,23 @@ TEST(PictureReader, RefusesWhatDoesNotFitAndWhatIsGone) {
         EXPECT_FALSE(fourth.empty());
         std::filesystem::resize_file(folder / "a.mkv", 2000);
         EXPECT_THROW(Read(reader, 90), archive::ArchiveError);
+    }
+}
+
+// A camera's picture may be twice as large as what a player sends.
+TEST(PictureReader, MakesPicturesOfMotionJpegThatDoNotFitSmaller) {
+    const ArchiveFolder folder;
+    Record(MakeClip(kMjpeg), folder / "a.mkv");
+    const archive::RecordingReader recording(folder / "a.mkv");
+    PictureReader reader(recording);
+    const Picture whole = Read(reader, 3);
+    for (const std::size_t divisor : {1U, 2U, 3U}) {
+        Picture smaller(whole.size() / divisor);
+        smaller.resize(reader.Read(3, smaller));
+        const auto size = JpegSize(smaller);
+        ASSERT_TRUE(size) << divisor;
+        EXPECT_EQ(JpegSize(whole)->width % size->width, 0) << divisor;
+        EXPECT_EQ(size->width == JpegSize(whole)->width, divisor == 1) << divisor;
     }
 }
 

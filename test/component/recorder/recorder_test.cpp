@@ -9,6 +9,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/process.h"
+#include "standalone/control/common_config.h"
 #include "test/component/recorder/recorder_fixture.h"
 #include "test/support/camera/mjpeg_camera.h"
 
@@ -220,6 +221,19 @@ TEST_F(RecorderTest, SuccessorOfAKilledRecorderGoesOnInItsRings) {
     listener.Next();
     EXPECT_TRUE(viewer.Ring() == rings[0] && listener.Ring() == rings[1]) << "viewers were sent away";
     EXPECT_EQ(Segments(), 2u);
+}
+
+TEST_F(RecorderTest, ThatHangsIsToldAsHangingAndLogsTheLostTime) {
+    const Child recorder = StartRecorder();
+    const auto is = [&](control::RecorderState state) {
+        return Eventually([&] { return control::FindRecorder(*installation_) == state; });
+    };
+    ASSERT_TRUE(Eventually([&] { return LogLines("started for ") == 1; }) && is(control::RecorderState::kAlive));
+    recorder.Signal(SIGSTOP);
+    EXPECT_TRUE(is(control::RecorderState::kHangs));
+    recorder.Signal(SIGCONT);
+    EXPECT_TRUE(is(control::RecorderState::kAlive));
+    EXPECT_EQ(LogLines("the recorder stood still for "), 1u);
 }
 
 TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {

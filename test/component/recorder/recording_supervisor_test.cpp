@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maintenance of several mounts, one of which fails.
+// Maintenance of several mounts, one of which fails; a disk that hangs.
 #include "standalone/recorder/recording_supervisor.h"
+
+#include <future>
 
 #include <gtest/gtest.h>
 
@@ -12,6 +14,23 @@
 
 namespace lookhaven::recorder {
 namespace {
+
+TEST(RecordingReport, HoldsNobodyUpWhileTheDiskHangs) {
+    std::promise<void> disk;
+    std::vector<std::size_t> written;
+    RecordingReport report([&, ready = disk.get_future().share()](const RecordingReport::States& states) {
+        ready.wait();
+        written.push_back(states.size());
+    });
+    for (const std::size_t cameras : {1U, 1U, 2U, 3U}) {
+        report.Publish(RecordingReport::States(cameras));
+    }
+    report.RequestStop();
+    EXPECT_FALSE(report.HasEnded()) << "it waits for the disk in its own thread";
+    disk.set_value();
+    ASSERT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return report.HasEnded(); }));
+    EXPECT_EQ(written.back(), 3U);
+}
 
 TEST(RecordingSupervisor, MaintainsTheMountsBesideOneThatFails) {
     const test::ArchiveFolder home;

@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <list>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -17,6 +18,7 @@
 #include "platform/admission/pairauth.h"
 #include "platform/log/dbglogcfg.h"
 #include "platform/output/multipartresponse.h"
+#include "platform/recording/eventsearch.h"
 #include "platform/webapi/apirequest.h"
 #include "platform/webapi/apiresponse.h"
 #include "test/support/host/test_player.h"
@@ -143,6 +145,11 @@ void Serve(APIRequest* request, APIResponse* response) {
         std::vector<char> much;
         much.reserve(std::size_t{300} << 20);
         response->SetSuccess(much.emplace_back());
+    } else if (method == "Search") {
+        std::list<Event> events;
+        EventFilterParam everything;
+        EventListGetAll(events, everything);
+        response->SetSuccess(static_cast<Json::UInt>(events.size()));
     } else if (method == "Crash") {
         std::abort();
     } else if (method == "Surroundings") {
@@ -174,6 +181,7 @@ const Row kTable[] = {{"Test", 1, "Nothing", Serve},
                       {"Test", 1, "DeafStream", Serve},
                       {"Test", 1, "Hang", Serve},
                       {"Test", 1, "Devour", Serve},
+                      {"Test", 1, "Search", Serve},
                       {"Test", 1, "Crash", Serve},
                       {"Test", 1, "Surroundings", Serve},
                       {"Test", 1, "Caller", Serve},

@@ -54,11 +54,14 @@ void PlayTest(const VEXO::APIRequest& request) {
     const std::string path = "/tmp/player_src.pid." + request.GetSessionID();
     WritePlayerFile(path);
     const bool follows = request.GetAPIMethod() == "PlayMjpegEvent" || request.GetParam("changerate", 0).asInt() != 0;
+    const auto half_opened_us = static_cast<useconds_t>(request.GetParam("opens", 0).asInt() * 500);
+    usleep(half_opened_us);
     ProgressIndicator progress(request.GetParam("timestamp", 0).asInt64(), true, true);
     DelayTimer timer(5'000);
     MultipartResponse response;
     int rate = request.GetParam("playrate", 1).asInt();
     int sum = 0;
+    usleep(half_opened_us);
     if (follows) {
         progress.Set(rate);
     }
