@@ -115,18 +115,28 @@ void Change(const Console& console, const Request& request) {
     console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
 }
 
+// Nothing when the disk is not there or fails.
+std::optional<std::int64_t> FreeBytes(const Mount& mount) {
+    try {
+        const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
+        return folder ? std::optional(folder->Space().free_bytes) : std::nullopt;
+    } catch (const std::system_error&) {
+        return std::nullopt;
+    }
+}
+
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     store::Events events(store);
     Json::Value data = Json::arrayValue;
     for (const Mount& mount : Mounts(store).List()) {
         const store::MountContent content = events.Content(mount.id);
-        const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
+        const std::optional<std::int64_t> free_bytes = FreeBytes(mount);
         Json::Value& entry = data.append(ToData(mount));
         entry["events"] = content.events;
         entry["size_bytes"] = content.size_bytes;
-        entry["present"] = folder.has_value();
-        entry["free_bytes"] = folder ? folder->Space().free_bytes : 0;
+        entry["present"] = free_bytes.has_value();
+        entry["free_bytes"] = free_bytes.value_or(0);
     }
     console.Answer(data, Table(kColumns, data));
 }

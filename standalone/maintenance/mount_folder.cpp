@@ -31,11 +31,6 @@ std::string MarkerText(int mount_id) {
     return "lookhaven mount " + std::to_string(mount_id) + "\n";
 }
 
-// Only these errors say that there is no such file; any other says nothing of what lies there.
-bool MeansAbsent(int error) {
-    return error == ENOENT || error == ENOTDIR;
-}
-
 // Empty when there is no such folder. Throws std::system_error when it cannot be told.
 base::FileDescriptor OpenFolderAt(int parent, const char* name) {
     base::FileDescriptor folder(::openat(parent, name, kFolderFlags));
@@ -85,6 +80,10 @@ std::vector<archive::FileName> WithIndex(archive::FileName name) {
 
 }  // namespace
 
+bool MeansAbsent(int error) {
+    return error == ENOENT || error == ENOTDIR;
+}
+
 std::int64_t MountSpace::ReserveBytes() const {
     constexpr std::int64_t kMiB = 1 << 20;
     return std::clamp(total_bytes / 50, 2 * kMiB, 512 * kMiB);
@@ -100,8 +99,12 @@ std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder
             return std::nullopt;
         }
         return MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY));
-    } catch (const std::system_error&) {
-        return std::nullopt;
+    } catch (const std::system_error& error) {
+        // A link or a folder in the marker's place is not ours.
+        if (MeansAbsent(error.code().value()) || error.code().value() == ELOOP) {
+            return std::nullopt;
+        }
+        throw;
     }
 }
 

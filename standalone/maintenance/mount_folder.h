@@ -28,12 +28,16 @@ struct MountSpace {
     std::int64_t ReserveBytes() const;
 };
 
+// Whether the error says that there is no such file. Any other says nothing of what lies there.
+bool MeansAbsent(int error);
+
 class MountFolder {
   public:
     // Makes the folder that of the mount; the marker of another mount is replaced. Throws std::system_error.
     static void WriteMarker(const std::filesystem::path& folder, int mount_id);
 
-    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted.
+    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted. Throws std::system_error
+    // when that cannot be told.
     static std::optional<MountFolder> Open(const std::filesystem::path& folder, int mount_id);
     // The folder exists and has no mount's marker. False, too, when the folder is missing.
     static bool HasNoMarker(const std::filesystem::path& folder);

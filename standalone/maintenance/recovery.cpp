@@ -5,6 +5,7 @@
 #include <string>
 
 #include "standalone/base/log.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 
 namespace lookhaven::maintenance {
@@ -43,6 +44,7 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_own_id, s
     if (!folder) {
         return false;
     }
+    FinishRemovals(store, mount, *folder, now_s);
     store::Events events(store);
     for (const store::Event& row : events.Open()) {
         if (row.mount_id == mount.id && row.id < first_own_id && !row.demo) {

@@ -74,8 +74,9 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
     }
     const archive::Contents contents = archive::CloseCrashed(path);
     if (contents.frame_count == 0) {
+        std::string done = Discard(mount, *name);
         events.Remove(std::array{row.id});
-        return Discard(mount, *name);
+        return done;
     }
     const store::Event whole = RowOf(*name, row.mount_id, contents);
     events.Finish(row.id, whole.end_s, whole.frame_count, whole.size_bytes);

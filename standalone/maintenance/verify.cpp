@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <limits>
 #include <map>
 #include <set>
@@ -16,6 +17,7 @@
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 #include "standalone/store/mounts.h"
 
@@ -37,6 +39,17 @@ struct Inspection {
     bool is_damaged_inside = false;
     std::int64_t frames = 0;
 };
+
+bool IsCode(const std::exception& failure, std::initializer_list<int> codes) {
+    const auto* error = dynamic_cast<const std::system_error*>(&failure);
+    return error != nullptr && std::ranges::find(codes, error->code().value()) != codes.end();
+}
+
+// What says something of the disk rather than of one file on it.
+bool IsDiskFailure(const std::exception& failure) {
+    return dynamic_cast<const std::system_error*>(&failure) != nullptr &&
+           !IsCode(failure, {ENOENT, ENOTDIR, ELOOP, EBUSY, EEXIST});
+}
 
 Frames WalkRecording(const std::filesystem::path& path) {
     const base::FileDescriptor file = archive::OpenFile(path, O_RDONLY);
@@ -63,6 +76,9 @@ Inspection Inspect(const std::filesystem::path& path) {
             return result;
         }
     } catch (const std::exception& failure) {
+        if (IsDiskFailure(failure)) {
+            throw;
+        }
         result.problem = std::string("an index cannot be used: ") + failure.what();
         result.must_rebuild_index = true;
         return result;
@@ -97,10 +113,13 @@ class Verification {
           known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
 
     VerifyReport Run() {
-        std::set<int> mounts;
         for (const store::Mount& mount : store::Mounts(store_).List()) {
-            mounts.insert(mount.id);
-            CheckMount(mount);
+            try {
+                CheckMount(mount);
+            } catch (const std::system_error& failure) {
+                report_.faults.push_back(
+                    {"mount " + std::to_string(mount.id) + " was not checked further: " + failure.what(), ""});
+            }
         }
         return std::move(report_);
     }
@@ -118,6 +137,9 @@ class Verification {
                                           " is not there, with " + std::to_string(rows.size()) + " events",
                                       ""});
             return;
+        }
+        if (repair_) {
+            FinishRemovals(store_, mount, *folder, base::WallSeconds());
         }
         for (std::size_t i = 0; i < rows.size(); ++i) {
             Try([&] { CheckRow(*folder, rows[i]); });
@@ -137,6 +159,9 @@ class Verification {
         } catch (const store::StoreError&) {
             throw;
         } catch (const std::exception& failure) {
+            if (repair_ && IsDiskFailure(failure)) {
+                throw;
+            }
             report_.faults.push_back({failure.what(), ""});
         }
     }
@@ -218,6 +243,9 @@ class Verification {
     void CheckFiles(const MountFolder& mount, int mount_id, const std::vector<store::Event>& rows) {
         std::set<std::string> expected;
         for (const store::Event& row : rows) {
+            expected.insert(row.path);
+        }
+        for (const store::Event& row : events_.InRemoval(mount_id)) {
             expected.insert(row.path);
         }
         for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {

@@ -144,11 +144,12 @@ void RecordingSupervisor::Maintain(store::Store& store) {
     RecoverMounts(store, now_s);
     maintenance::CompleteMarks(store, now_s);
     const std::int64_t now_us = base::MonotonicMicros();
+    const bool is_clock_trusted = clock_watch_.IsTrusted(now_us, now_s);
     if (!needs_space_.exchange(false) && now_us < next_retention_us_) {
         return;
     }
     next_retention_us_ = now_us + kRetentionUs;
-    DeleteOld(store, now_s);
+    DeleteOld(store, now_s, is_clock_trusted);
 }
 
 // Each mount once, as soon as it is mounted; what failed is tried again.
@@ -180,10 +181,12 @@ void RecordingSupervisor::MarkNewMounts(store::Store& store) {
     }
 }
 
-void RecordingSupervisor::DeleteOld(store::Store& store, std::int64_t now_s) {
+void RecordingSupervisor::DeleteOld(store::Store& store, std::int64_t now_s, bool is_clock_trusted) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
         TryOn(mount, "delete old events of", [&] {
-            const maintenance::RetentionResult deleted = maintenance::EnforceRetention(store, mount, now_s);
+            const maintenance::RetentionResult deleted = maintenance::EnforceRetention(
+                store, mount, now_s,
+                is_clock_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits);
             if (deleted.events > 0) {
                 base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
                               " old events");

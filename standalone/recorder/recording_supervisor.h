@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "standalone/maintenance/clock_watch.h"
 #include "standalone/recorder/recording_worker.h"
 
 namespace lookhaven::recorder {
@@ -45,7 +46,7 @@ class RecordingSupervisor {
     void Maintain(store::Store& store);
     void RecoverMounts(store::Store& store, std::int64_t now_s);
     void MarkNewMounts(store::Store& store);
-    void DeleteOld(store::Store& store, std::int64_t now_s);
+    void DeleteOld(store::Store& store, std::int64_t now_s, bool is_clock_trusted);
     template <class Work>
     void TryOn(const store::Mount& mount, const std::string& purpose, Work&& work);
 
@@ -54,6 +55,7 @@ class RecordingSupervisor {
     control::FlushRequests flush_requests_;
     EventRowQueue rows_;
     std::atomic<bool> needs_space_ = true;
+    maintenance::ClockWatch clock_watch_;                   // only the maintenance thread uses it
     std::set<int> recovered_mounts_;                        // only the maintenance thread uses it
     std::int64_t next_retention_us_ = 0;                    // likewise
     std::map<std::string, std::string> reported_failures_;  // likewise; by purpose
