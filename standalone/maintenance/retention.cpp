@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <exception>
+#include <map>
 #include <span>
 #include <utility>
 #include <vector>
@@ -33,7 +34,8 @@ class Retention {
   public:
     Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
               AgeLimit age_limit)
-        : mount_(mount),
+        : store_(store),
+          mount_(mount),
           folder_(folder),
           events_(store),
           marks_(store),
@@ -83,10 +85,20 @@ class Retention {
                 break;
             }
         }
+        std::map<int, std::int64_t> ends_s;  // of what each camera has lost
         for (const store::Event& event : going) {
             ++deleted_.events;
             deleted_.bytes += event.size_bytes;
-            RemoveTraces(event);
+            ends_s[event.camera_id] = std::max(ends_s[event.camera_id], event.end_s);
+            ClearRecordingLog(event);
+        }
+        for (const auto& [camera, end_s] : ends_s) {
+            RemoveMarks(camera, end_s);
+        }
+        for (const store::Event& event : going) {
+            if (archive::DayOf(event.start_s) != archive::DayOf(now_s_)) {
+                folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
+            }
         }
         events_.FinishRemoval(IdsOf(going));
         if (failure) {
@@ -135,14 +147,6 @@ class Retention {
         }
     }
 
-    void RemoveTraces(const store::Event& event) {
-        RemoveMarks(event);
-        ClearRecordingLog(event);
-        if (archive::DayOf(event.start_s) != archive::DayOf(now_s_)) {
-            folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
-        }
-    }
-
     bool HasFootage(int camera, std::int64_t begin_s, std::int64_t end_s) {
         store::EventFilter filter;
         filter.camera_ids = {camera};
@@ -152,19 +156,29 @@ class Retention {
         return !events_.List(filter).empty();
     }
 
-    void RemoveMarks(const store::Event& event) {
-        for (const store::Mark& mark : marks_.EndedBy(event.camera_id, event.end_s, kMarksAtOnce)) {
-            if (HasFootage(event.camera_id, mark.start_s, mark.end_s)) {
-                continue;
-            }
-            try {
-                if (RemoveSpan(mark)) {
-                    marks_.Remove(mark.id);
-                    ++deleted_.marks;
+    // Those that ended by then and have no footage left, however many before them have some.
+    void RemoveMarks(int camera, std::int64_t end_s) {
+        std::vector<store::Mark> page;
+        store::Mark last;
+        do {
+            page = marks_.EndedBy(camera, end_s, last, kMarksAtOnce);
+            for (const store::Mark& mark : page) {
+                last = mark;
+                if (!HasFootage(camera, mark.start_s, mark.end_s)) {
+                    RemoveMark(mark);
                 }
-            } catch (const std::system_error& failure) {  // its file may lie on another mount
-                base::LogWarning("mark " + std::to_string(mark.id) + " stays: " + failure.what());
             }
+        } while (page.size() == kMarksAtOnce);
+    }
+
+    void RemoveMark(const store::Mark& mark) {
+        try {
+            if (RemoveSpan(mark)) {
+                marks_.Remove(mark.id);
+                ++deleted_.marks;
+            }
+        } catch (const std::system_error& failure) {  // its file may lie on another mount
+            base::LogWarning("mark " + std::to_string(mark.id) + " stays: " + failure.what());
         }
     }
 
@@ -180,8 +194,7 @@ class Retention {
             return true;
         }
         const std::optional<store::Mount> other = mounts_.Find(mark.mount_id);
-        const std::optional<MountFolder> folder =
-            other ? MountFolder::Open(other->path, other->id) : std::optional<MountFolder>();
+        const std::optional<MountFolder> folder = other ? OpenMount(store_, *other) : std::optional<MountFolder>();
         if (folder) {
             folder->Remove(*name);
         }
@@ -209,6 +222,7 @@ class Retention {
         }
     }
 
+    store::Store& store_;
     const store::Mount& mount_;
     const MountFolder& folder_;
     store::Events events_;
@@ -225,7 +239,7 @@ class Retention {
 
 RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
                                  AgeLimit age_limit) {
-    const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
+    const std::optional<MountFolder> folder = OpenMount(store, mount);
     return folder ? Retention(store, mount, *folder, now_s, age_limit).Run() : RetentionResult{};
 }
 

@@ -20,6 +20,7 @@
 #include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::maintenance {
 
@@ -110,7 +111,8 @@ class Verification {
           events_(store),
           repair_(repair),
           progress_(progress),
-          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
+          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
+          free_from_(std::min(known_id_, store::RecorderLease(store).Current().first_own_id)) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
@@ -128,10 +130,7 @@ class Verification {
     void CheckMount(const store::Mount& mount) {
         std::vector<store::Event> rows;
         events_.VisitMount(mount.id, [&](const store::Event& event) { rows.push_back(event); });
-        std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
-        if (!folder && rows.empty() && MountFolder::HasNoMarker(mount.path)) {
-            return;  // nothing was recorded yet
-        }
+        std::optional<MountFolder> folder = OpenMount(store_, mount);
         if (!folder) {
             report_.faults.push_back({"mount " + std::to_string(mount.id) + " at " + mount.path +
                                           " is not there, with " + std::to_string(rows.size()) + " events",
@@ -252,7 +251,13 @@ class Verification {
             expected.insert(mark.path);
         }
         const std::int64_t newest_s = base::WallSeconds() - kMinAgeS;
-        for (const MountFolder::File& file : mount.Files()) {
+        std::vector<MountFolder::File> files = mount.Files();
+        // Adopted in the order of recording, as far as dates tell.
+        std::ranges::sort(files, {}, [](const MountFolder::File& file) { return file.name.start_s; });
+        if (repair_) {
+            store::Mounts(store_).ReserveIds(mount.LastCamera(), 0);
+        }
+        for (const MountFolder::File& file : files) {
             if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < newest_s) {
                 Try([&] { CheckStray(mount, mount_id, file.name, rows.empty()); });
             }
@@ -267,7 +272,7 @@ class Verification {
         case archive::FileKind::kRecording:
             if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
                 Report("no event has the file " + path,
-                       [&] { return AdoptRecording(events_, mount, mount_id, name, known_id_); });
+                       [&] { return AdoptRecording(events_, mount, mount_id, name, free_from_); });
             }
             break;
         case archive::FileKind::kIndex:
@@ -285,10 +290,7 @@ class Verification {
     }
 
     // True for an event that began after the rows were read.
-    bool HasRow(const archive::FileName& name) {
-        const std::optional<store::Event> row = events_.Find(name.event);
-        return row && row->path == archive::PathOf(name);
-    }
+    bool HasRow(const archive::FileName& name) { return IsRowOf(events_.Find(name.event), name); }
 
     bool HasMark(int id) {
         store::Marks marks(store_);
@@ -308,6 +310,7 @@ class Verification {
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
     const int known_id_;
+    const int free_from_;  // a recorder may still give out the ids from here on
     VerifyReport report_;
 };
 

@@ -158,7 +158,8 @@ void CameraRecorder::CheckMount() {
     const std::filesystem::path path = event_ ? event_->Start().mount : request_.plan.mount;
     const int id = event_ ? event_->Start().mount_id : request_.plan.mount_id;
     Guard([&] {
-        const std::optional<maintenance::MountFolder> mount = maintenance::MountFolder::Open(path, id);
+        const std::optional<maintenance::MountFolder> mount =
+            maintenance::MountFolder::Open(path, {id, request_.plan.installation});
         if (!mount) {
             Pause(RecordingState::kMountGone, "mount " + std::to_string(id) + " at " + path.string() + " is not there");
             return;

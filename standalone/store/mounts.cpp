@@ -132,6 +132,15 @@ void Mounts::Remove(int id, bool forget_events) {
     });
 }
 
+void Mounts::ReserveIds(int camera, int event) {
+    connection_.Write([&](soci::session& sql) {
+        for (const auto& [counter, id] : {std::pair("camera", camera), std::pair("event", event)}) {
+            Execute(sql, "update counters set value = :id where name = :name and value < :at_least", id,
+                    std::string(counter), id);
+        }
+    });
+}
+
 std::optional<Mount> Mounts::Find(int id) {
     return connection_.FetchOne<Mount>("where id = :id", id);
 }

@@ -132,6 +132,10 @@ constexpr const char* kDisks[] = {
     // read from the index alone.
     "create index events_by_order on events (mount_id, id, size_bytes)"
     " where recording = 0 and archived = 0 and demo = 0",
+
+    "create table recorder_lease (count bigint not null primary key, holder text not null,"
+    " first_own_id integer not null)",
+    "insert into recorder_lease (count, holder, first_own_id) values (0, '', 2147483647)",
 };
 
 constexpr Migration kMigrations[] = {
@@ -139,7 +143,7 @@ constexpr Migration kMigrations[] = {
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
     {"e-maps, their devices, recording servers", kEmaps},
     {"who reported a mark, and who may", kReporters},
-    {"events in removal, the order of recording", kDisks},
+    {"events in removal, the order of recording, the recorder's role", kDisks},
 };
 
 }  // namespace

@@ -111,8 +111,10 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
         {"mount gone", [&] { std::filesystem::rename(home_ / "recordings", home_ / "away"); }, "is not there",
          "mount its disk", [&] { std::filesystem::rename(home_ / "away", home_ / "recordings"); }},
         {"another folder", [&] { std::filesystem::remove(home_ / "recordings" / ".lookhaven-mount"); },
-         "not the folder that was added", "mount set",
-         [&] { EXPECT_EQ(Run("mount set 2 --path " + (home_ / "recordings").string()).code, 0); }},
+         "its disk is not mounted", "do: mount its disk\n",
+         [&] { std::ofstream(home_ / "recordings" / ".lookhaven-mount") << "lookhaven mount 2 of another\n"; }},
+        {"another's folder", [] {}, "another mount or installation", "mount set 2 --take-over",
+         [&] { EXPECT_EQ(Run("mount set 2 --take-over").code, 0); }},
         {"above the limit",
          [&] {
              Sql("update mounts set max_bytes = 10")();

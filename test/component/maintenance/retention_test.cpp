@@ -16,6 +16,7 @@
 #include "standalone/archive/recording_log.h"
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/clock_watch.h"
+#include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/marks.h"
@@ -35,7 +36,7 @@ constexpr std::int64_t kNow = kNoon + 86400;
 
 class RetentionTest : public testing::Test {
   protected:
-    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId()); }
+    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkOf(footage_.Records(), footage_.MountId())); }
 
     RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
@@ -145,7 +146,9 @@ TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
     const int event = footage_.Record(1, kNoon, 60);
     for (const auto& hide : std::initializer_list<std::function<void()>>{
              [&] { fs::remove(footage_.Mount() / ".lookhaven-mount"); },
-             [&] { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId() + 1); },
+             [&] {
+                 MountFolder::WriteMarker(footage_.Mount(), {footage_.MountId(), "somebody else's"});
+             },
              [&] { fs::rename(footage_.Mount(), folder_ / "unplugged"); },
          }) {
         hide();
@@ -214,6 +217,42 @@ TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
     EXPECT_FALSE(marks.Find(store::MarkKind::kAlert, mark));
     EXPECT_THAT(Left(), IsEmpty());
     EXPECT_FALSE(fs::exists(footage_.Mount() / "1"));
+}
+
+TEST_F(RetentionTest, MarksThatArchivedFootageKeepsHideNoOther) {
+    const int archived = footage_.Record(1, kNoon, 60);
+    const int plain = footage_.Record(1, kNoon + 60, 60);
+    store::Events(footage_.Records()).SetArchived(archived, true);
+    for (int i = 0; i < 120; ++i) {
+        footage_.Mark(1, 1, kNoon + 10, 5, "kept", archived);
+    }
+    footage_.Mark(1, 1, kNoon + 80, 5, "gone", plain);
+    EXPECT_EQ(Run(1).marks, 1);
+}
+
+TEST_F(RetentionTest, AMarkIsCompleteOnceNoRowOfItCanCome) {
+    const int event = footage_.Record(1, kNoon, 60);
+    store::Marks marks(footage_.Records());
+    const auto add = [&](int camera, std::int64_t at_s) {
+        return marks.Add(store::MarkKind::kAlert, camera, at_s, 1, "").id;
+    };
+    const int whole = add(1, kNoon + 30);
+    const int partly = add(1, kNoon + 58);  // its row ends before it
+    const int none = add(2, kNoon + 30);
+    bool ended = false;
+    const auto complete = [&] {
+        for (const int mount : {footage_.MountId(), 0}) {
+            CompleteMarks(footage_.Records(), mount, kNow, [&](const store::Mark&) { return ended; });
+        }
+        std::string states;
+        for (const int id : {whole, partly, none}) {
+            states += std::string(NameOf(marks.Find(store::MarkKind::kAlert, id)->state)) + " ";
+        }
+        return states;
+    };
+    EXPECT_EQ(complete(), "saved pending pending ") << event;
+    ended = true;
+    EXPECT_EQ(complete(), "saved saved missed ");
 }
 
 TEST_F(RetentionTest, APathThatLeadsAwayRemovesNothing) {

@@ -27,9 +27,9 @@ class CameraRecorderTest : public testing::Test {
     CameraRecorderTest() {
         for (const int mount : {1, 2}) {
             fs::create_directory(MountPath(mount));
-            maintenance::MountFolder::WriteMarker(MountPath(mount), mount);
+            maintenance::MountFolder::WriteMarker(MountPath(mount), {mount, "here"});
         }
-        request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
+        request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1), "here"};
         recorder_.SetRequest(request_);
     }
 
@@ -149,8 +149,8 @@ TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
          [&] { request_.plan.mode = store::RecordMode::kAlways; }},
         {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
          [&] { fs::rename(hidden, MountPath(1)); }},
-        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 9); },
-         [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 1); }},
+        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::WriteMarker(MountPath(1), {1, "elsewhere"}); },
+         [&] { maintenance::MountFolder::WriteMarker(MountPath(1), {1, "here"}); }},
         {RecordingState::kNoMount, true, [&] { request_.plan.mount_id = 0; }, [&] { request_.plan.mount_id = 1; }},
     };
     for (const Row& row : rows) {

@@ -213,14 +213,15 @@ TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
     EXPECT_FALSE(marks_.Find(MarkKind::kPos, alert.id)) << "an alert is no POS transaction";
     EXPECT_FALSE(events_.Find(alert.id));
     EXPECT_GT(events_.NextId(), pos.id) << "one counter for both";
-    EXPECT_THAT(marks_.EndedBy(camera, kDay, 9), IsEmpty()) << "pending";
+    EXPECT_THAT(marks_.EndedBy(camera, kDay, {}, 9), IsEmpty()) << "pending";
     EXPECT_TRUE(marks_.Save(pos.id, 7, "1/a.span"));
     EXPECT_TRUE(marks_.Miss(alert.id));
     EXPECT_THAT(marks_.Pending(), IsEmpty());
     EXPECT_THAT(Ids(marks_.OnMount(7)), ElementsAre(pos.id));
     EXPECT_EQ(marks_.OnMount(7)[0].path, "1/a.span");
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, 9)), ElementsAre(pos.id));
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, 9)), ElementsAre(pos.id, alert.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, {}, 9)), ElementsAre(pos.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, {}, 9)), ElementsAre(pos.id, alert.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, pos, 9)), ElementsAre(alert.id));
     EXPECT_TRUE(marks_.Remove(pos.id));
     EXPECT_FALSE(marks_.Remove(pos.id) || marks_.Save(pos.id, 7, "x") || marks_.Miss(pos.id));
 
