@@ -21,10 +21,12 @@
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/recorder_name.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/recorder_lease.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::cli {
@@ -198,6 +200,25 @@ Findings CheckRecorder(const base::Installation& installation) {
              "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
 }
 
+// Another host's recorder may record the cameras of a store that both share.
+Findings CheckRole(const base::Installation& installation) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    if (config == nullptr || !control::IsRecorderAlive(*config)) {
+        return {};
+    }
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        const std::string holder = store::RecorderLease(store).Current().holder;
+        if (!holder.empty() && holder != maintenance::RecorderName(installation)) {
+            return {{"the cameras of this store are recorded by the recorder of " + holder,
+                     "stop one of the two recorders, or give each a store of its own"}};
+        }
+    } catch (const store::StoreError&) {
+        return {};  // CheckStore reports it
+    }
+    return {};
+}
+
 // What the recorder reports of each camera.
 Findings CheckRecordings(const base::Installation& installation) {
     control::CommonConfig* config = control::MapCommonConfig(installation);
@@ -237,10 +258,11 @@ struct Check {
     const char* name;
     Findings (*run)(const base::Installation&);
 };
-constexpr Check kChecks[] = {{"folder", CheckFolder},           {"store", CheckStore},
-                             {"mounts", CheckMounts},           {"host", CheckHost},
-                             {"recorder", CheckRecorder},       {"recordings", CheckRecordings},
-                             {"maintenance", CheckMaintenance}, {"segments", CheckSegments}};
+constexpr Check kChecks[] = {{"folder", CheckFolder},         {"store", CheckStore},
+                             {"mounts", CheckMounts},         {"host", CheckHost},
+                             {"recorder", CheckRecorder},     {"role", CheckRole},
+                             {"recordings", CheckRecordings}, {"maintenance", CheckMaintenance},
+                             {"segments", CheckSegments}};
 
 void Examine(const Console& console) {
     const base::Installation installation = console.Installation();

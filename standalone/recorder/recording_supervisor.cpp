@@ -2,33 +2,21 @@
 #include "standalone/recorder/recording_supervisor.h"
 
 #include <algorithm>
-#include <array>
 #include <utility>
-
-#include <unistd.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/recorder_name.h"
 
 namespace lookhaven::recorder {
-
-namespace {
-
-std::string HostName() {
-    std::array<char, 256> name{};
-    ::gethostname(name.data(), name.size() - 1);
-    return name.data();
-}
-
-}  // namespace
 
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
-      rows_(installation.StoreUrl(), installation.Home().string() + " on " + HostName()),
+      rows_(installation.StoreUrl(), maintenance::RecorderName(installation)),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(),

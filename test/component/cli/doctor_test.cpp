@@ -124,6 +124,8 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
              store::Events(store).AddAll(std::vector{event});
          },
          "above its limit", "raise the limit", Sql("delete from events")},
+        {"another recorder", Sql("update recorder_lease set holder = '/var on nvr2'"), "/var on nvr2",
+         "stop one of the two", Sql("update recorder_lease set holder = ''")},
         {"mute host", [&] { host_.reset(), host_ = std::make_unique<FakeHost>(socket, false); }, "does not answer",
          "start the server", [&] { host_.reset(); }},
         {"no host", [&] { std::filesystem::remove(socket); }, "does not answer", "start the server",
