@@ -2,6 +2,7 @@
 //
 // The doctor: sees each thing that is wrong, says what to do, and is content when nothing is.
 #include <cstring>
+#include <fstream>
 #include <functional>
 #include <thread>
 
