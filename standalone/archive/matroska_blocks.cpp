@@ -2,6 +2,7 @@
 #include "standalone/archive/matroska_blocks.h"
 
 #include <algorithm>
+#include <array>
 #include <bit>
 
 #include <sys/stat.h>
@@ -271,6 +272,33 @@ bool MatroskaBlocks::ReadCluster(std::vector<FrameEntry>& frames) {
         }
         position_ = element->end;
     }
+}
+
+bool MatroskaBlocks::SkipDamage() {
+    constexpr std::size_t kStepBytes = 1 << 16;
+    constexpr std::array<std::uint8_t, 4> kClusterId{0x1F, 0x43, 0xB6, 0x75};
+    // What looks like a cluster may lie within a frame; a file made for it could hold one in every fourth byte.
+    constexpr int kMaxAttempts = 1000;
+    const std::uint64_t size = FileSize();
+    int attempts = 0;
+    for (std::uint64_t at = position_ + 1; at < size && attempts < kMaxAttempts;) {
+        const std::span<const std::uint8_t> bytes = Bytes(at, kStepBytes);
+        const auto found = std::ranges::search(bytes, kClusterId);
+        if (found.empty()) {
+            at += std::max<std::size_t>(bytes.size(), kClusterId.size()) - (kClusterId.size() - 1);
+            continue;
+        }
+        at += static_cast<std::uint64_t>(found.begin() - bytes.begin());
+        ++attempts;
+        std::vector<FrameEntry> ignored;
+        const std::optional<Element> cluster = ReadElement(at, size);
+        if (cluster && ReadFrames(*cluster, ignored)) {
+            position_ = at;
+            return true;
+        }
+        ++at;
+    }
+    return false;
 }
 
 bool MatroskaBlocks::ReadFrames(const Element& cluster, std::vector<FrameEntry>& frames) {

@@ -33,6 +33,10 @@ class MatroskaBlocks {
     // std::system_error.
     bool ReadCluster(std::vector<FrameEntry>& frames);
 
+    // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none. Throws
+    // std::system_error.
+    bool SkipDamage();
+
     // Where the last complete cluster ends, or what precedes the first.
     std::uint64_t Position() const { return position_; }
 

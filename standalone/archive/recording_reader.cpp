@@ -25,6 +25,8 @@ namespace {
 constexpr std::int64_t kMaxFrameMs = 1000;
 // A frame is in the index within this time, unless the disk is in trouble.
 constexpr std::int64_t kMaxIndexDelayMs = 3000;
+// Without a frame for longer than this, a recording has been ended: a longer silence is a step of the clock.
+constexpr std::int64_t kMaxSilenceMs = 15'000;
 // H.264 and H.265 reorder a frame across no more than this many others.
 constexpr std::size_t kMaxReordered = 16;
 
@@ -121,6 +123,7 @@ void RecordingReader::Refresh() {
     if (is_span_) {
         OpenSegments();
     }
+    const std::int64_t newest_before_ms = newest_ms_;
     // They finish one after the other; what has finished is not read again.
     for (; read_segments_ < segments_.size(); ++read_segments_) {
         Append(static_cast<std::uint32_t>(read_segments_));
@@ -128,19 +131,30 @@ void RecordingReader::Refresh() {
             break;
         }
     }
-    const std::int64_t now_ms = base::WallMillis();
     const bool is_open = read_segments_ < segments_.size();
     if (is_span_) {
         grows_ = is_open ? segments_[read_segments_]->LatestWallMs() < end_wall_ms_
-                         : now_ms < end_wall_ms_ + kMaxIndexDelayMs;
+                         : base::WallMillis() < end_wall_ms_ + kMaxIndexDelayMs;
     } else {
         grows_ = is_open;
     }
-    if (grows_) {
-        const std::int64_t max_ms = std::int64_t{base::kMaxRecordingSeconds} * 1000;
-        const std::int64_t until_ms = is_span_ ? std::min(now_ms, end_wall_ms_) : now_ms;
-        RepeatLast(std::min(until_ms - start_wall_ms_ - kMaxIndexDelayMs, max_ms));
+    if (grows_ && newest_ms_ >= 0) {
+        RepeatUntilNow(newest_before_ms);
     }
+}
+
+// The wall clock tells how old the newest frame was when it was first seen; from then on the monotonic clock does.
+void RecordingReader::RepeatUntilNow(std::int64_t newest_before_ms) {
+    const std::int64_t now_us = base::MonotonicMicros();
+    if (newest_before_ms < 0) {
+        const std::int64_t age_ms = base::WallMillis() - start_wall_ms_ - newest_ms_;
+        newest_us_ = now_us - std::clamp<std::int64_t>(age_ms, 0, kMaxSilenceMs) * 1000;
+    } else if (newest_ms_ != newest_before_ms) {
+        newest_us_ = now_us;
+    }
+    const std::int64_t end_ms =
+        is_span_ ? end_wall_ms_ - start_wall_ms_ : std::int64_t{base::kMaxRecordingSeconds} * 1000;
+    RepeatLast(std::min(newest_ms_ + (now_us - newest_us_) / 1000, end_ms) - kMaxIndexDelayMs);
 }
 
 // Opens the recordings that were added to the span file.
@@ -185,6 +199,7 @@ void RecordingReader::Place(std::uint32_t segment, std::uint32_t entry, std::int
         throw ArchiveError(path_.string() + " has more frames than can be counted");
     }
     frames_.push_back({segment, entry, time_ms});
+    newest_ms_ = time_ms;
 }
 
 void RecordingReader::RepeatLast(std::int64_t before_ms) {

@@ -74,6 +74,7 @@ class RecordingReader {
     void Append(std::uint32_t segment);
     void Place(std::uint32_t segment, std::uint32_t entry, std::int64_t time_ms);
     void RepeatLast(std::int64_t before_ms);
+    void RepeatUntilNow(std::int64_t newest_before_ms);
     std::int64_t PeriodMs() const;
 
     std::filesystem::path path_;
@@ -84,6 +85,8 @@ class RecordingReader {
     std::vector<std::unique_ptr<Segment>> segments_;
     std::size_t read_segments_ = 0;  // those that are finished and completely read
     std::vector<RecordedFrame> frames_;
+    std::int64_t newest_ms_ = -1;  // time of the last frame that is no repetition
+    std::int64_t newest_us_ = 0;   // when it was shown, by the monotonic clock
     bool grows_ = false;
 };
 

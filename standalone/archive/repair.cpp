@@ -80,7 +80,7 @@ Contents Summary(const IndexHeader& header, const std::vector<FrameEntry>& frame
             recording_bytes + SizeOf(OpenFile(index_path, O_RDONLY), index_path)};
 }
 
-// Every frame up to the first damage, and where they end.
+// Every frame that can be decoded, and where they end.
 struct Walk {
     IndexHeader header;
     std::vector<FrameEntry> frames;
@@ -91,12 +91,15 @@ std::optional<Walk> WalkRecording(int file) {
     try {
         MatroskaBlocks blocks(file);
         Walk walk{blocks.Header(), {}, 0};
-        while (blocks.ReadCluster(walk.frames)) {
-        }
-        walk.end = blocks.Position();
-        // Players begin at a key frame.
-        const auto first = std::find_if(walk.frames.begin(), walk.frames.end(), [](const auto& f) { return f.key; });
-        walk.frames.erase(walk.frames.begin(), first);
+        do {
+            std::vector<FrameEntry> piece;
+            while (blocks.ReadCluster(piece)) {
+            }
+            walk.end = blocks.Position();
+            // Players begin at a key frame; after a damaged cluster, so do decoders.
+            const auto first = std::ranges::find_if(piece, &FrameEntry::key);
+            walk.frames.insert(walk.frames.end(), first, piece.end());
+        } while (blocks.SkipDamage());
         return walk.frames.empty() ? std::nullopt : std::optional(std::move(walk));
     } catch (const ArchiveError&) {
         return std::nullopt;
@@ -117,8 +120,9 @@ Contents CloseCrashed(const std::filesystem::path& recording) {
     if (!walk) {
         return {};
     }
-    // Fewer frames than the index lists means damage in the middle: the frames after it are still there.
-    if (index && !index->is_damaged && EndOf(index->frames) > EndOf(walk->frames)) {
+    // Fewer frames than the index lists means damage in the middle: the frames in and after it may still be there.
+    if (index && !index->is_damaged &&
+        (EndOf(index->frames) > EndOf(walk->frames) || index->frames.size() > walk->frames.size())) {
         walk->frames = index->frames;
         walk->end = size;
     }

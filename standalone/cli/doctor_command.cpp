@@ -20,10 +20,13 @@
 #include "standalone/cli/units.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/recorder_name.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/recorder_lease.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::cli {
@@ -87,10 +90,13 @@ Findings CheckMount(store::Store& store, const store::Mount& mount) {
     if (::access(mount.path.c_str(), F_OK) != 0) {
         return {{name + " is not there", Concat("mount its disk, or lookhaven mount set ", mount.id, " --path")}};
     }
-    const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
+    const auto folder = maintenance::OpenMount(store, mount);
     if (!folder) {
-        return {{name + " is not the folder that was added",
-                 Concat("mount its disk, or lookhaven mount set ", mount.id, " --path ", mount.path)}};
+        // A mount point without its disk has no marker: nothing that marks it may be advised.
+        return {{maintenance::MountFolder::ReadMarker(mount.path)
+                     ? Finding{name + " holds recordings of another mount or installation",
+                               Concat("mount its own disk, or lookhaven mount set ", mount.id, " --take-over")}
+                     : Finding{name + " has no marker: its disk is not mounted", "mount its disk"}}};
     }
     Findings findings;
     if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
@@ -108,6 +114,25 @@ Findings CheckMount(store::Store& store, const store::Mount& mount) {
             {Concat(name, " holds ", FormatSize(held), " of recordings, above its limit of ",
                     FormatSize(mount.max_bytes)),
              "start the recorder, which removes the oldest; archived events stay, raise the limit for them"});
+    }
+    return findings;
+}
+
+// What the recorder's own work on the mounts meets.
+Findings CheckMaintenance(const base::Installation& installation) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    Findings findings;
+    if (config != nullptr && control::IsRecorderAlive(*config)) {
+        for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
+            if (status.state == maintenance::MountState::kInUse) {
+                findings.push_back({Concat("mount ", status.mount, " is used by the recorder of another state folder"),
+                                    "stop that recorder, or give this installation a mount of its own"});
+            }
+            if (status.state == maintenance::MountState::kFailing) {
+                findings.push_back({Concat("the recorder's work on mount ", status.mount, " fails: ", status.reason),
+                                    "check that disk; the work goes on by itself"});
+            }
+        }
     }
     return findings;
 }
@@ -181,6 +206,25 @@ Findings CheckRecorder(const base::Installation& installation) {
              "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
 }
 
+// Another host's recorder may record the cameras of a store that both share.
+Findings CheckRole(const base::Installation& installation) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    if (config == nullptr || !control::IsRecorderAlive(*config)) {
+        return {};
+    }
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        const std::string holder = store::RecorderLease(store).Current().holder;
+        if (!holder.empty() && holder != maintenance::RecorderName(installation)) {
+            return {{"the cameras of this store are recorded by the recorder of " + holder,
+                     "stop one of the two recorders, or give each a store of its own"}};
+        }
+    } catch (const store::StoreError&) {
+        return {};  // CheckStore reports it
+    }
+    return {};
+}
+
 // What the recorder reports of each camera.
 Findings CheckRecordings(const base::Installation& installation) {
     if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
@@ -219,8 +263,10 @@ struct Check {
     const char* name;
     Findings (*run)(const base::Installation&);
 };
-constexpr Check kChecks[] = {{"folder", CheckFolder},    {"store", CheckStore},       {"mounts", CheckMounts},
-                             {"host", CheckHost},        {"recorder", CheckRecorder}, {"recordings", CheckRecordings},
+constexpr Check kChecks[] = {{"folder", CheckFolder},         {"store", CheckStore},
+                             {"mounts", CheckMounts},         {"host", CheckHost},
+                             {"recorder", CheckRecorder},     {"role", CheckRole},
+                             {"recordings", CheckRecordings}, {"maintenance", CheckMaintenance},
                              {"segments", CheckSegments}};
 
 void Examine(const Console& console) {

@@ -7,6 +7,7 @@
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/mount_marker.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
@@ -56,8 +57,23 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.name = "default";
     mount.path = folder.lexically_normal().string();
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
-    maintenance::MountFolder::WriteMarker(folder, mounts.Add(mount));
+    RequireFreeFolder(store, mount.path, 0, false);
+    mount.id = mounts.Add(mount);
+    MarkFolder(store, mount);
     return true;
+}
+
+// Early versions marked their mounts without saying whose they are.
+void RenewMarkers(store::Store& store) {
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        try {
+            if (maintenance::MountFolder::ReadMarker(mount.path) == maintenance::MountMark{mount.id, ""}) {
+                maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkOf(store, mount.id));
+            }
+        } catch (const std::system_error&) {
+            continue;  // lookhaven doctor says what is wrong with it
+        }
+    }
 }
 
 void Init(const Console& console, const Request& request) {
@@ -67,6 +83,7 @@ void Init(const Console& console, const Request& request) {
     const int steps = store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
     const bool mount_added = AddDefaultMount(store, installation);
+    RenewMarkers(store);
     const bool admin_added = !admin.empty() && AddAdmin(store, admin);
     const std::string home = installation.Home().string();
     std::string text = "The state folder " + home + " is ready.";

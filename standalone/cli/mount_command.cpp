@@ -8,6 +8,7 @@
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/mount_marker.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -29,6 +30,7 @@ struct Request {
     std::optional<std::string> max_age;
     std::optional<bool> enabled;
     bool make_default = false;
+    bool take_over = false;
     bool forget = false;
 };
 
@@ -96,11 +98,12 @@ void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Mount mount;
     Apply(mount, request);
+    RequireFreeFolder(store, mount.path, 0, request.take_over);
     if (mount.name.empty()) {
         mount.name = std::filesystem::path(mount.path).filename();
     }
     mount.id = Mounts(store).Add(mount);
-    maintenance::MountFolder::WriteMarker(mount.path, mount.id);
+    MarkFolder(store, mount);
     console.Answer(ToData(*Mounts(store).Find(mount.id)), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
@@ -108,11 +111,25 @@ void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Mount mount = Require(Mounts(store).Find(request.id), "there is no mount ", request.id);
     Apply(mount, request);
+    const bool is_marked = !request.path.empty() || request.take_over;
+    if (is_marked) {
+        RequireFreeFolder(store, RequireFolder(mount.path), mount.id, request.take_over);
+    }
     Mounts(store).Update(mount);
-    if (!request.path.empty()) {
-        maintenance::MountFolder::WriteMarker(mount.path, mount.id);
+    if (is_marked) {
+        MarkFolder(store, mount);
     }
     console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
+}
+
+// Nothing when the disk is not there or fails.
+std::optional<std::int64_t> FreeBytes(store::Store& store, const Mount& mount) {
+    try {
+        const auto folder = maintenance::OpenMount(store, mount);
+        return folder ? std::optional(folder->Space().free_bytes) : std::nullopt;
+    } catch (const std::system_error&) {
+        return std::nullopt;
+    }
 }
 
 void List(const Console& console) {
@@ -121,12 +138,12 @@ void List(const Console& console) {
     Json::Value data = Json::arrayValue;
     for (const Mount& mount : Mounts(store).List()) {
         const store::MountContent content = events.Content(mount.id);
-        const auto folder = maintenance::MountFolder::Open(mount.path, mount.id);
+        const std::optional<std::int64_t> free_bytes = FreeBytes(store, mount);
         Json::Value& entry = data.append(ToData(mount));
         entry["events"] = content.events;
         entry["size_bytes"] = content.size_bytes;
-        entry["present"] = folder.has_value();
-        entry["free_bytes"] = folder ? folder->Space().free_bytes : 0;
+        entry["present"] = free_bytes.has_value();
+        entry["free_bytes"] = free_bytes.value_or(0);
     }
     console.Answer(data, Table(kColumns, data));
 }
@@ -155,6 +172,7 @@ void AddMount(CLI::App& program, const Console& console) {
                     "Total size of its recordings, such as 500G; 0 for no limit but the disk's")
             .Option("--max-age", request.max_age, "Age up to which recordings are kept, such as 30d; 0 for no limit")
             .Flag("--default", request.make_default, "Record cameras here that name no mount")
+            .Flag("--take-over", request.take_over, "Also take a folder that belongs to another mount or installation")
             .Switch("--enable,!--disable", request.enabled, "Whether recordings are written to it");
     };
     Command add = group.Add("add", "Adds an existing folder", Add).Option("path", request.path, "The folder", Required);

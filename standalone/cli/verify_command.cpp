@@ -1,13 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven verify: compares the store's events with the files on the mounts.
+#include <algorithm>
 #include <iostream>
 
 #include <unistd.h>
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/mount_lock.h"
+#include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/verify.h"
+#include "standalone/store/mounts.h"
 
 namespace lookhaven::cli {
 
@@ -21,8 +27,28 @@ struct Request {
     bool repair = false;
 };
 
+// Repair would rename and forget what a recorder of another state folder with the same mounts has recorded.
+void RequireOwnMounts(store::Store& store, const base::Installation& installation) {
+    control::CommonConfig* config = control::MapCommonConfig(installation);
+    const bool is_running = config != nullptr && control::IsRecorderAlive(*config);
+    const auto states =
+        is_running ? maintenance::ReadMountStatus(installation) : std::vector<maintenance::MountStatus>();
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        const bool is_refused = std::ranges::any_of(states, [&](const maintenance::MountStatus& status) {
+            return status.mount == mount.id && status.state == maintenance::MountState::kInUse;
+        });
+        if (maintenance::OpenMount(store, mount) && (is_refused || !is_running) &&
+            maintenance::MountLock::IsHeld(mount.path)) {
+            throw Failure(kDataError, "the recorder of another state folder uses the mount at ", mount.path);
+        }
+    }
+}
+
 void Verify(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
+    if (request.repair) {
+        RequireOwnMounts(store, console.Installation());
+    }
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;
     const maintenance::VerifyReport report = maintenance::Verify(
         store, request.repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>());

@@ -102,7 +102,7 @@ void AddMark(store::Store& store, int camera, std::int64_t moment_s, bool is_tra
 
 EventCounts RecordFootage(store::Store& store, std::int64_t now_s) {
     const std::optional<store::Mount> mount = store::Mounts(store).FindForPlan(0);
-    if (!mount || !maintenance::MountFolder::Open(mount->path, mount->id)) {
+    if (!mount || !maintenance::OpenMount(store, *mount)) {
         throw NotReady("there is no mount to record to: run lookhaven init");
     }
     store::Events events(store);

@@ -16,9 +16,6 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-// Rows are stored about a second after their frames; after this time no more footage is expected.
-constexpr std::int64_t kMaxRowDelayS = 10;
-
 std::vector<store::Event> FootageOf(store::Events& events, const store::Mark& mark) {
     store::EventFilter filter;
     filter.camera_ids = {mark.camera_id};
@@ -54,8 +51,7 @@ bool SaveMark(store::Store& store, const store::Mark& mark) {
         return store::Marks(store).Miss(mark.id);
     }
     const std::optional<store::Mount> mount = store::Mounts(store).Find(footage.back().mount_id);
-    const std::optional<MountFolder> folder =
-        mount ? MountFolder::Open(mount->path, mount->id) : std::optional<MountFolder>();
+    const std::optional<MountFolder> folder = mount ? OpenMount(store, *mount) : std::optional<MountFolder>();
     if (!folder) {
         return false;
     }
@@ -65,14 +61,18 @@ bool SaveMark(store::Store& store, const store::Mark& mark) {
     return store::Marks(store).Save(mark.id, mount->id, archive::PathOf(name));
 }
 
-void CompleteMarks(store::Store& store, std::int64_t now_s) {
+void CompleteMarks(store::Store& store, int mount_id, std::int64_t now_s, const FootageEnds& has_ended) {
     for (const store::Mark& mark : store::Marks(store).Pending()) {
         if (mark.end_s > now_s) {
             continue;
         }
         try {
+            // First: a row that comes in between is then seen.
+            const bool ended = has_ended(mark);
             store::Events events(store);
-            if (now_s >= mark.end_s + kMaxRowDelayS || IsComplete(FootageOf(events, mark), mark)) {
+            const std::vector<store::Event> footage = FootageOf(events, mark);
+            const int held_by = footage.empty() ? 0 : footage.back().mount_id;
+            if (held_by == mount_id && (ended || IsComplete(footage, mark))) {
                 SaveMark(store, mark);
             }
         } catch (const store::StoreError&) {

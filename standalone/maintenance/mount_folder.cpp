@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
 #include <cstdio>
 #include <memory>
 #include <string>
@@ -17,23 +18,35 @@
 
 #include "standalone/archive/file.h"
 #include "standalone/base/file.h"
+#include "standalone/store/settings.h"
 
 namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr const char* kMarkerName = ".lookhaven-mount";
-constexpr std::size_t kMaxMarkerBytes = 64;
+constexpr std::size_t kMaxMarkerBytes = 128;
+constexpr std::string_view kMarkerBegin = "lookhaven mount ";
+constexpr std::string_view kMarkerOwner = " of ";
+// Above this a folder's name is a number of somebody else's.
+constexpr int kMaxCamera = 1'000'000;
 constexpr const char* kLogName = "seconds";
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
-std::string MarkerText(int mount_id) {
-    return "lookhaven mount " + std::to_string(mount_id) + "\n";
+std::string MarkerText(const MountMark& mark) {
+    return std::string(kMarkerBegin) + std::to_string(mark.mount_id) +
+           (mark.installation.empty() ? "" : std::string(kMarkerOwner) + mark.installation) + "\n";
 }
 
-// Only these errors say that there is no such file; any other says nothing of what lies there.
-bool MeansAbsent(int error) {
-    return error == ENOENT || error == ENOTDIR;
+std::optional<MountMark> ParseMarker(const std::string& text) {
+    MountMark mark;
+    if (text.starts_with(kMarkerBegin)) {
+        std::from_chars(text.data() + kMarkerBegin.size(), text.data() + text.size(), mark.mount_id);
+    }
+    if (const std::size_t at = text.find(kMarkerOwner); at != text.npos && text.ends_with('\n')) {
+        mark.installation = text.substr(at + kMarkerOwner.size());
+        mark.installation.pop_back();
+    }
+    return MarkerText(mark) == text ? std::optional(mark) : std::nullopt;
 }
 
 // Empty when there is no such folder. Throws std::system_error when it cannot be told.
@@ -85,30 +98,35 @@ std::vector<archive::FileName> WithIndex(archive::FileName name) {
 
 }  // namespace
 
+bool MeansAbsent(int error) {
+    return error == ENOENT || error == ENOTDIR;
+}
+
 std::int64_t MountSpace::ReserveBytes() const {
     constexpr std::int64_t kMiB = 1 << 20;
     return std::clamp(total_bytes / 50, 2 * kMiB, 512 * kMiB);
 }
 
-void MountFolder::WriteMarker(const std::filesystem::path& folder, int mount_id) {
-    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mount_id), 0644);
+void MountFolder::WriteMarker(const std::filesystem::path& folder, const MountMark& mark) {
+    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mark), 0644);
 }
 
-std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, int mount_id) {
+std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, const MountMark& mark) {
+    return ReadMarker(folder) == mark
+               ? std::optional(MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY)))
+               : std::nullopt;
+}
+
+std::optional<MountMark> MountFolder::ReadMarker(const std::filesystem::path& folder) {
     try {
-        if (archive::ReadFile(folder / kMarkerName, kMaxMarkerBytes) != MarkerText(mount_id)) {
+        return ParseMarker(archive::ReadFile(folder / kMarkerName, kMaxMarkerBytes));
+    } catch (const std::system_error& error) {
+        // A link or a folder in the marker's place is not ours.
+        if (MeansAbsent(error.code().value()) || error.code().value() == ELOOP) {
             return std::nullopt;
         }
-        return MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY));
-    } catch (const std::system_error&) {
-        return std::nullopt;
+        throw;
     }
-}
-
-bool MountFolder::HasNoMarker(const std::filesystem::path& folder) {
-    struct stat status {};
-    return ::stat(folder.c_str(), &status) == 0 && S_ISDIR(status.st_mode) &&
-           ::lstat((folder / kMarkerName).c_str(), &status) != 0 && errno == ENOENT;
 }
 
 MountFolder::MountFolder(std::filesystem::path path, base::FileDescriptor folder)
@@ -212,6 +230,26 @@ std::vector<MountFolder::File> MountFolder::Files(std::int64_t from_s) const {
         }
     }
     return files;
+}
+
+int MountFolder::LastCamera() const {
+    int last = 0;
+    for (const std::string& name : NamesIn(folder_.Get())) {
+        int camera = 0;
+        std::from_chars(name.data(), name.data() + name.size(), camera);
+        if (IsCameraFolder(name) && camera <= kMaxCamera) {
+            last = std::max(last, camera);
+        }
+    }
+    return last;
+}
+
+MountMark MarkOf(store::Store& store, int mount_id) {
+    return {mount_id, store::Settings(store).Installation()};
+}
+
+std::optional<MountFolder> OpenMount(store::Store& store, const store::Mount& mount) {
+    return MountFolder::Open(mount.path, MarkOf(store, mount.id));
 }
 
 }  // namespace lookhaven::maintenance

@@ -3,7 +3,8 @@
 // The folder of a storage mount, and the only code that removes anything from it.
 //
 // Why so        A disk that is not mounted leaves an empty folder, which looks like a mount whose recordings are gone;
-//               rows must not be removed for that. So a mount carries a marker, the file .lookhaven-mount.
+//               rows must not be removed for that. So a mount carries a marker, the file .lookhaven-mount. It says
+//               whose mount it is, too: two installations on one folder would remove each other's footage.
 // Invariants    (1) Only the files of archive/layout.h are ever removed, and folders that became empty.
 //               (2) Everything is opened relative to the mount's own descriptor and without following symbolic links:
 //               no call leaves the mount.
@@ -11,12 +12,13 @@
 
 #include <cstdint>
 #include <filesystem>
-#include <functional>
 #include <optional>
+#include <string>
 #include <vector>
 
 #include "standalone/archive/layout.h"
 #include "standalone/base/file_descriptor.h"
+#include "standalone/store/mounts.h"
 
 namespace lookhaven::maintenance {
 
@@ -28,15 +30,30 @@ struct MountSpace {
     std::int64_t ReserveBytes() const;
 };
 
+// Whether the error says that there is no such file. Any other says nothing of what lies there.
+bool MeansAbsent(int error);
+
+constexpr const char* kMarkerName = ".lookhaven-mount";
+
+// What a marker says.
+struct MountMark {
+    int mount_id = 0;
+    std::string installation;  // store::Settings::Installation; empty in markers of early versions
+
+    bool operator==(const MountMark&) const = default;
+};
+
 class MountFolder {
   public:
-    // Makes the folder that of the mount; the marker of another mount is replaced. Throws std::system_error.
-    static void WriteMarker(const std::filesystem::path& folder, int mount_id);
+    // Makes the folder that of the mount; another marker is replaced. Only when an owner says so: a folder that merely
+    // looks empty may be a mount point without its disk. Throws std::system_error.
+    static void WriteMarker(const std::filesystem::path& folder, const MountMark& mark);
+    // Nothing when there is none, or what is there is no marker. Throws std::system_error when that cannot be told.
+    static std::optional<MountMark> ReadMarker(const std::filesystem::path& folder);
 
-    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted.
-    static std::optional<MountFolder> Open(const std::filesystem::path& folder, int mount_id);
-    // The folder exists and has no mount's marker. False, too, when the folder is missing.
-    static bool HasNoMarker(const std::filesystem::path& folder);
+    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted. Throws std::system_error
+    // when that cannot be told.
+    static std::optional<MountFolder> Open(const std::filesystem::path& folder, const MountMark& mark);
 
     const std::filesystem::path& Path() const { return path_; }
     // Throws std::system_error.
@@ -62,6 +79,8 @@ class MountFolder {
     };
     // All files that archive/layout.h knows, of that second's UTC day and later, in no order. Throws std::system_error.
     std::vector<File> Files(std::int64_t from_s = 0) const;
+    // The highest number of a camera's folder; 0 when there is none. Throws std::system_error.
+    int LastCamera() const;
 
   private:
     MountFolder(std::filesystem::path path, base::FileDescriptor folder);
@@ -71,5 +90,10 @@ class MountFolder {
     std::filesystem::path path_;
     base::FileDescriptor folder_;
 };
+
+// The marker that the mount's folder must have.
+MountMark MarkOf(store::Store& store, int mount_id);
+// MountFolder::Open with that marker. Throws store::StoreError, too.
+std::optional<MountFolder> OpenMount(store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::maintenance

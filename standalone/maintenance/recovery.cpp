@@ -5,6 +5,7 @@
 #include <string>
 
 #include "standalone/base/log.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 
 namespace lookhaven::maintenance {
@@ -13,44 +14,50 @@ namespace {
 
 constexpr std::int64_t kDayS = 86'400;
 
-// Trouble with one file must not keep the others from being recovered.
+// Trouble with one file must not keep the others from being recovered. False when there was some.
 template <class Work>
-void LogOutcome(Work&& work) {
+bool Try(Work&& work) {
     try {
         if (const std::string done = work(); !done.empty()) {
             base::LogInfo(done);
         }
+        return true;
     } catch (const store::StoreError&) {
         throw;
     } catch (const std::exception& failure) {
         base::LogWarning(std::string("cannot recover a recording: ") + failure.what());
+        return false;
     }
 }
 
-void AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_own_id, std::int64_t now_s) {
+bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_own_id, std::int64_t now_s) {
+    bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
         if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_own_id &&
-            !events.Find(file.name.event)) {
-            LogOutcome([&] { return AdoptRecording(events, mount, mount_id, file.name, first_own_id); });
+            !IsRowOf(events.Find(file.name.event), file.name)) {
+            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, first_own_id); });
         }
     }
+    return is_complete;
 }
 
 }  // namespace
 
 bool Recover(store::Store& store, const store::Mount& mount, int first_own_id, std::int64_t now_s) {
-    const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
+    const std::optional<MountFolder> folder = OpenMount(store, mount);
     if (!folder) {
         return false;
     }
+    FinishRemovals(store, mount, *folder, now_s);
+    store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
+    bool is_complete = true;
     store::Events events(store);
     for (const store::Event& row : events.Open()) {
         if (row.mount_id == mount.id && row.id < first_own_id && !row.demo) {
-            LogOutcome([&] { return CloseEvent(events, *folder, row); });
+            is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    AdoptRecent(events, *folder, mount.id, first_own_id, now_s);
-    return true;
+    return AdoptRecent(events, *folder, mount.id, first_own_id, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

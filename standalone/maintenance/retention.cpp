@@ -2,12 +2,14 @@
 #include "standalone/maintenance/retention.h"
 
 #include <algorithm>
-#include <array>
+#include <exception>
+#include <map>
+#include <span>
+#include <utility>
 #include <vector>
 
 #include "standalone/archive/recording_log.h"
 #include "standalone/base/log.h"
-#include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 
@@ -17,32 +19,91 @@ namespace {
 
 constexpr int kEventsAtOnce = 100;
 constexpr int kMarksAtOnce = 100;
+// So many events with dates in the future are looked past.
+constexpr std::size_t kMaxMisdated = 10'000;
+
+std::vector<int> IdsOf(std::span<const store::Event> events) {
+    std::vector<int> ids;
+    for (const store::Event& event : events) {
+        ids.push_back(event.id);
+    }
+    return ids;
+}
 
 class Retention {
   public:
-    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s)
-        : mount_(mount),
+    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
+              AgeLimit age_limit)
+        : store_(store),
+          mount_(mount),
           folder_(folder),
           events_(store),
           marks_(store),
           mounts_(store),
-          now_s_(now_s) {}
+          now_s_(now_s),
+          has_age_limit_(age_limit == AgeLimit::kApplies && mount.max_age_s > 0) {}
 
     RetentionResult Run() {
+        FinishRemovals();
         excess_bytes_ = Excess();
-        for (bool has_more = true; has_more;) {
-            const std::vector<store::Event> oldest = events_.Oldest(mount_.id, kEventsAtOnce);
-            const int before = deleted_.events;
+        // Dated in the future: as old as what was recorded after them.
+        std::vector<store::Event> misdated;
+        int after = 0;
+        for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
+            const std::vector<store::Event> oldest = events_.Oldest(mount_.id, after, kEventsAtOnce);
+            std::vector<store::Event> chosen;
+            has_more = oldest.size() == kEventsAtOnce;
             for (const store::Event& event : oldest) {
-                // The limits are the mount's, so no younger event exceeds them either.
-                if (!IsExpired(event) && deleted_.bytes >= excess_bytes_) {
-                    return deleted_;
+                after = event.id;
+                if (IsInExcess(event) || IsExpired(event)) {
+                    std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
+                    chosen.push_back(event);
+                } else if (has_age_limit_ && event.end_s > now_s_) {
+                    misdated.push_back(event);
+                } else {
+                    // The limits are the mount's, so no younger event exceeds them either.
+                    has_more = false;
+                    break;
                 }
-                Delete(event);
             }
-            has_more = oldest.size() == kEventsAtOnce && deleted_.events > before;
+            Delete(chosen);
         }
         return deleted_;
+    }
+
+    // The rows in removal: those of this pass, and those that a crash left.
+    void FinishRemovals() {
+        std::vector<store::Event> going = events_.InRemoval(mount_.id);
+        std::exception_ptr failure;
+        for (auto event = going.begin(); event != going.end(); ++event) {
+            try {
+                RemoveFile(*event);
+            } catch (const std::system_error&) {
+                failure = std::current_exception();
+                events_.CancelRemoval(IdsOf({event, going.end()}));
+                going.erase(event, going.end());
+                break;
+            }
+        }
+        std::map<int, std::int64_t> ends_s;  // of what each camera has lost
+        for (const store::Event& event : going) {
+            ++deleted_.events;
+            deleted_.bytes += event.size_bytes;
+            ends_s[event.camera_id] = std::max(ends_s[event.camera_id], event.end_s);
+            ClearRecordingLog(event);
+        }
+        for (const auto& [camera, end_s] : ends_s) {
+            RemoveMarks(camera, end_s);
+        }
+        for (const store::Event& event : going) {
+            if (archive::DayOf(event.start_s) != archive::DayOf(now_s_)) {
+                folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
+            }
+        }
+        events_.FinishRemoval(IdsOf(going));
+        if (failure) {
+            std::rethrow_exception(failure);
+        }
     }
 
   private:
@@ -59,36 +120,30 @@ class Retention {
         return excess;
     }
 
+    // Of what precedes it, all is in excess.
+    bool IsInExcess(const store::Event& event) {
+        return std::exchange(chosen_bytes_, chosen_bytes_ + event.size_bytes) < excess_bytes_;
+    }
+
     // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a
     // mount.
     bool IsExpired(const store::Event& event) const {
-        return mount_.max_age_s > 0 && event.end_s <= now_s_ - mount_.max_age_s;
+        return has_age_limit_ && event.end_s <= now_s_ - mount_.max_age_s;
     }
 
-    void Delete(const store::Event& event) {
+    void Delete(std::span<const store::Event> events) {
+        if (!events.empty()) {
+            events_.BeginRemoval(IdsOf(events));
+            FinishRemovals();
+        }
+    }
+
+    void RemoveFile(const store::Event& event) {
         const std::optional<archive::FileName> name = archive::ParsePath(event.path);
-        events_.Remove(std::array{event.id});
-        ++deleted_.events;
-        deleted_.bytes += event.size_bytes;
-        if (!name || name->kind != archive::FileKind::kRecording) {
+        if (name && name->kind == archive::FileKind::kRecording) {
+            folder_.Remove(*name);
+        } else {
             base::LogWarning("the path of event " + std::to_string(event.id) + " names no recording: left alone");
-            return;
-        }
-        RemoveFileOrRestoreRow(event, *name);
-        RemoveMarks(event);
-        ClearRecordingLog(event);
-        if (archive::DayOf(event.start_s) < archive::DayOf(now_s_)) {
-            folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
-        }
-    }
-
-    void RemoveFileOrRestoreRow(const store::Event& event, const archive::FileName& name) {
-        try {
-            folder_.Remove(name);
-        } catch (const std::system_error& failure) {
-            base::LogWarning("event " + std::to_string(event.id) + " keeps its row: " + failure.what());
-            events_.Begin(event);
-            throw;
         }
     }
 
@@ -101,19 +156,29 @@ class Retention {
         return !events_.List(filter).empty();
     }
 
-    void RemoveMarks(const store::Event& event) {
-        for (const store::Mark& mark : marks_.EndedBy(event.camera_id, event.end_s, kMarksAtOnce)) {
-            if (HasFootage(event.camera_id, mark.start_s, mark.end_s)) {
-                continue;
-            }
-            try {
-                if (RemoveSpan(mark)) {
-                    marks_.Remove(mark.id);
-                    ++deleted_.marks;
+    // Those that ended by then and have no footage left, however many before them have some.
+    void RemoveMarks(int camera, std::int64_t end_s) {
+        std::vector<store::Mark> page;
+        store::Mark last;
+        do {
+            page = marks_.EndedBy(camera, end_s, last, kMarksAtOnce);
+            for (const store::Mark& mark : page) {
+                last = mark;
+                if (!HasFootage(camera, mark.start_s, mark.end_s)) {
+                    RemoveMark(mark);
                 }
-            } catch (const std::system_error& failure) {  // its file may lie on another mount
-                base::LogWarning("mark " + std::to_string(mark.id) + " stays: " + failure.what());
             }
+        } while (page.size() == kMarksAtOnce);
+    }
+
+    void RemoveMark(const store::Mark& mark) {
+        try {
+            if (RemoveSpan(mark)) {
+                marks_.Remove(mark.id);
+                ++deleted_.marks;
+            }
+        } catch (const std::system_error& failure) {  // its file may lie on another mount
+            base::LogWarning("mark " + std::to_string(mark.id) + " stays: " + failure.what());
         }
     }
 
@@ -129,8 +194,7 @@ class Retention {
             return true;
         }
         const std::optional<store::Mount> other = mounts_.Find(mark.mount_id);
-        const std::optional<MountFolder> folder =
-            other ? MountFolder::Open(other->path, other->id) : std::optional<MountFolder>();
+        const std::optional<MountFolder> folder = other ? OpenMount(store_, *other) : std::optional<MountFolder>();
         if (folder) {
             folder->Remove(*name);
         }
@@ -158,21 +222,29 @@ class Retention {
         }
     }
 
+    store::Store& store_;
     const store::Mount& mount_;
     const MountFolder& folder_;
     store::Events events_;
     store::Marks marks_;
     store::Mounts mounts_;
     const std::int64_t now_s_;
+    const bool has_age_limit_;
     std::int64_t excess_bytes_ = 0;
+    std::int64_t chosen_bytes_ = 0;
     RetentionResult deleted_;
 };
 
 }  // namespace
 
-RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
-    const std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
-    return folder ? Retention(store, mount, *folder, now_s).Run() : RetentionResult{};
+RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
+                                 AgeLimit age_limit) {
+    const std::optional<MountFolder> folder = OpenMount(store, mount);
+    return folder ? Retention(store, mount, *folder, now_s, age_limit).Run() : RetentionResult{};
+}
+
+void FinishRemovals(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s) {
+    Retention(store, mount, folder, now_s, AgeLimit::kWaits).FinishRemovals();
 }
 
 }  // namespace lookhaven::maintenance

@@ -74,8 +74,9 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
     }
     const archive::Contents contents = archive::CloseCrashed(path);
     if (contents.frame_count == 0) {
+        std::string done = Discard(mount, *name);
         events.Remove(std::array{row.id});
-        return Discard(mount, *name);
+        return done;
     }
     const store::Event whole = RowOf(*name, row.mount_id, contents);
     events.Finish(row.id, whole.end_s, whole.frame_count, whole.size_bytes);
@@ -83,13 +84,13 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
 }
 
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int known_id) {
+                           int free_from) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     if (contents.frame_count == 0) {
         return Discard(mount, name);
     }
     archive::FileName kept = name;
-    if (name.event > known_id) {
+    if (name.event >= free_from || events.Find(name.event)) {
         kept.event = events.NextId();
         if (!mount.Renumber(name, kept.event)) {
             return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";
@@ -97,6 +98,10 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
     }
     events.Begin(RowOf(kept, mount_id, contents));
     return "adopted " + (mount.Path() / archive::PathOf(kept)).string();
+}
+
+bool IsRowOf(const std::optional<store::Event>& row, const archive::FileName& name) {
+    return row && row->path == archive::PathOf(name);
 }
 
 }  // namespace lookhaven::maintenance

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <limits>
 #include <map>
 #include <set>
@@ -16,8 +17,10 @@
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::maintenance {
 
@@ -37,6 +40,17 @@ struct Inspection {
     bool is_damaged_inside = false;
     std::int64_t frames = 0;
 };
+
+bool IsCode(const std::exception& failure, std::initializer_list<int> codes) {
+    const auto* error = dynamic_cast<const std::system_error*>(&failure);
+    return error != nullptr && std::ranges::find(codes, error->code().value()) != codes.end();
+}
+
+// What says something of the disk rather than of one file on it.
+bool IsDiskFailure(const std::exception& failure) {
+    return dynamic_cast<const std::system_error*>(&failure) != nullptr &&
+           !IsCode(failure, {ENOENT, ENOTDIR, ELOOP, EBUSY, EEXIST});
+}
 
 Frames WalkRecording(const std::filesystem::path& path) {
     const base::FileDescriptor file = archive::OpenFile(path, O_RDONLY);
@@ -63,6 +77,9 @@ Inspection Inspect(const std::filesystem::path& path) {
             return result;
         }
     } catch (const std::exception& failure) {
+        if (IsDiskFailure(failure)) {
+            throw;
+        }
         result.problem = std::string("an index cannot be used: ") + failure.what();
         result.must_rebuild_index = true;
         return result;
@@ -94,13 +111,17 @@ class Verification {
           events_(store),
           repair_(repair),
           progress_(progress),
-          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
+          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
+          free_from_(std::min(known_id_, store::RecorderLease(store).Current().first_own_id)) {}
 
     VerifyReport Run() {
-        std::set<int> mounts;
         for (const store::Mount& mount : store::Mounts(store_).List()) {
-            mounts.insert(mount.id);
-            CheckMount(mount);
+            try {
+                CheckMount(mount);
+            } catch (const std::system_error& failure) {
+                report_.faults.push_back(
+                    {"mount " + std::to_string(mount.id) + " was not checked further: " + failure.what(), ""});
+            }
         }
         return std::move(report_);
     }
@@ -109,15 +130,15 @@ class Verification {
     void CheckMount(const store::Mount& mount) {
         std::vector<store::Event> rows;
         events_.VisitMount(mount.id, [&](const store::Event& event) { rows.push_back(event); });
-        std::optional<MountFolder> folder = MountFolder::Open(mount.path, mount.id);
-        if (!folder && rows.empty() && MountFolder::HasNoMarker(mount.path)) {
-            return;  // nothing was recorded yet
-        }
+        std::optional<MountFolder> folder = OpenMount(store_, mount);
         if (!folder) {
             report_.faults.push_back({"mount " + std::to_string(mount.id) + " at " + mount.path +
                                           " is not there, with " + std::to_string(rows.size()) + " events",
                                       ""});
             return;
+        }
+        if (repair_) {
+            FinishRemovals(store_, mount, *folder, base::WallSeconds());
         }
         for (std::size_t i = 0; i < rows.size(); ++i) {
             Try([&] { CheckRow(*folder, rows[i]); });
@@ -137,6 +158,9 @@ class Verification {
         } catch (const store::StoreError&) {
             throw;
         } catch (const std::exception& failure) {
+            if (repair_ && IsDiskFailure(failure)) {
+                throw;
+            }
             report_.faults.push_back({failure.what(), ""});
         }
     }
@@ -220,11 +244,20 @@ class Verification {
         for (const store::Event& row : rows) {
             expected.insert(row.path);
         }
+        for (const store::Event& row : events_.InRemoval(mount_id)) {
+            expected.insert(row.path);
+        }
         for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
             expected.insert(mark.path);
         }
         const std::int64_t newest_s = base::WallSeconds() - kMinAgeS;
-        for (const MountFolder::File& file : mount.Files()) {
+        std::vector<MountFolder::File> files = mount.Files();
+        // Adopted in the order of recording, as far as dates tell.
+        std::ranges::sort(files, {}, [](const MountFolder::File& file) { return file.name.start_s; });
+        if (repair_) {
+            store::Mounts(store_).ReserveIds(mount.LastCamera(), 0);
+        }
+        for (const MountFolder::File& file : files) {
             if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < newest_s) {
                 Try([&] { CheckStray(mount, mount_id, file.name, rows.empty()); });
             }
@@ -239,7 +272,7 @@ class Verification {
         case archive::FileKind::kRecording:
             if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
                 Report("no event has the file " + path,
-                       [&] { return AdoptRecording(events_, mount, mount_id, name, known_id_); });
+                       [&] { return AdoptRecording(events_, mount, mount_id, name, free_from_); });
             }
             break;
         case archive::FileKind::kIndex:
@@ -257,10 +290,7 @@ class Verification {
     }
 
     // True for an event that began after the rows were read.
-    bool HasRow(const archive::FileName& name) {
-        const std::optional<store::Event> row = events_.Find(name.event);
-        return row && row->path == archive::PathOf(name);
-    }
+    bool HasRow(const archive::FileName& name) { return IsRowOf(events_.Find(name.event), name); }
 
     bool HasMark(int id) {
         store::Marks marks(store_);
@@ -280,6 +310,7 @@ class Verification {
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
     const int known_id_;
+    const int free_from_;  // a recorder may still give out the ids from here on
     VerifyReport report_;
 };
 

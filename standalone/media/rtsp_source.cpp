@@ -31,7 +31,8 @@ class RtspSource : public Source {
         if (!packet) {
             throw SourceError("the camera ended the stream");
         }
-        packet->timestamp_us = timeline_.Map(packet->timestamp_us, base::MonotonicMicros());
+        packet->timestamp_us = timeline_.Map(packet->timestamp_us, base::MonotonicMicros(),
+                                             packet->medium == Medium::kVideo && packet->key_frame);
         return *packet;
     }
 

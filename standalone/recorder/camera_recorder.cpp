@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/recorder/camera_recorder.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <utility>
@@ -17,6 +18,7 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kTryAgainUs = 1'000'000;
+constexpr std::int64_t kMaxDistanceUs = 30'000'000;  // of pictures; more is a camera that was away
 // Split here even where no key frame comes or the next event has no number.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
 
@@ -34,6 +36,7 @@ CameraRecorder::~CameraRecorder() {
 }
 
 void CameraRecorder::Take(Frame frame) {
+    const std::int64_t distance_us = DistanceAfter(frame);
     if (frame.medium == base::Medium::kVideo) {
         last_picture_us_ = context_.monotonic_us();
     }
@@ -41,12 +44,23 @@ void CameraRecorder::Take(Frame frame) {
         Close();
     }
     if (event_) {
-        Guard([&] { event_->Write(frame); });
+        Guard([&] { Write(frame); });
         last_flush_us_ = context_.monotonic_us();
-        return;
+    } else {
+        pre_record_.Add(std::move(frame), request_.plan.pre_s);
+        Begin();
     }
-    pre_record_.Add(std::move(frame), request_.plan.pre_s);
-    Begin();
+    distance_us_ = distance_us;
+}
+
+std::int64_t CameraRecorder::DistanceAfter(const Frame& frame) {
+    if (frame.medium != base::Medium::kVideo) {
+        return distance_us_;
+    }
+    const std::int64_t before_us = std::exchange(previous_us_, frame.timestamp_us);
+    const std::int64_t distance_us =
+        before_us == 0 ? 0 : std::clamp<std::int64_t>(frame.timestamp_us - before_us, 0, kMaxDistanceUs);
+    return distance_us_ + (distance_us - distance_us_) / 4;
 }
 
 void CameraRecorder::Tick() {
@@ -91,14 +105,33 @@ int CameraRecorder::Reason() const {
     return request_.plan.mode == store::RecordMode::kAlways ? base::kReasonContinuous : base::kReasonAlarm;
 }
 
-bool CameraRecorder::MustEndBefore(const Frame& frame) const {
+// Of more than a few seconds, and not of a camera that always sends so few pictures.
+bool CameraRecorder::IsAfterGap(const Frame& frame) const {
+    return frame.medium == base::Medium::kVideo &&
+           frame.timestamp_us - newest_us_ > std::max(kMaxGapUs, 3 * distance_us_);
+}
+
+void CameraRecorder::Write(const Frame& frame) {
+    if (frame.medium == base::Medium::kVideo) {
+        event_->Write(frame, IsAfterGap(frame));
+        newest_us_ = std::max(newest_us_, frame.timestamp_us);
+    } else {
+        event_->Write(frame, false);
+    }
+}
+
+bool CameraRecorder::MustEndBefore(const Frame& frame) {
     const EventStart& start = event_->Start();
     const std::int64_t length_us = frame.timestamp_us - start.timestamp_us;
     if (!event_->Takes(frame) || length_us >= kMaxEventUs) {
         return true;
     }
+    has_gap_ |= IsAfterGap(frame);
     if (frame.medium != base::Medium::kVideo || !frame.key_frame) {
         return false;
+    }
+    if (has_gap_ || frame.timestamp_us < newest_us_) {
+        return true;
     }
     const std::int64_t drift_ms = WallOf(frame.timestamp_us) - (start.wall_ms + length_us / 1000);
     return IsOverdue(length_us) || std::abs(drift_ms) > kClockStepMs || start.mount_id != request_.plan.mount_id ||
@@ -124,13 +157,15 @@ void CameraRecorder::Begin() {
             return;
         }
         event_.emplace(*start, *pre_record_.First().format, context_.rows);
+        newest_us_ = start->timestamp_us;
+        has_gap_ = false;
         if (state_ != RecordingState::kReady) {
             base::LogInfo("camera " + std::to_string(camera_) + " is recorded again");
         }
         state_ = RecordingState::kRecording;
         last_flush_us_ = context_.monotonic_us();
         for (const Frame& frame : pre_record_.TakeAll()) {
-            event_->Write(frame);
+            Write(frame);
         }
     });
 }
@@ -158,7 +193,8 @@ void CameraRecorder::CheckMount() {
     const std::filesystem::path path = event_ ? event_->Start().mount : request_.plan.mount;
     const int id = event_ ? event_->Start().mount_id : request_.plan.mount_id;
     Guard([&] {
-        const std::optional<maintenance::MountFolder> mount = maintenance::MountFolder::Open(path, id);
+        const std::optional<maintenance::MountFolder> mount =
+            maintenance::MountFolder::Open(path, {id, request_.plan.installation});
         if (!mount) {
             Pause(RecordingState::kMountGone, "mount " + std::to_string(id) + " at " + path.string() + " is not there");
             return;

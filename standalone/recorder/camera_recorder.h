@@ -5,7 +5,8 @@
 // Invariants    (1) Every event begins with a key frame and is split before one. Only the end of the request, a lost
 //               camera and a failing disk end it elsewhere.
 //               (2) Times within an event come from the monotonic clock. A step of the wall clock by more than
-//               kClockStepMs ends the event, so that no event's times are wrong by more.
+//               kClockStepMs ends the event, so that no event's times are wrong by more. So do times that go back and a
+//               gap of more than kMaxGapUs that is not the camera's usual distance of pictures.
 //               (3) Nothing here throws: trouble with a mount is a state, and recording resumes by itself.
 // Thread safety One thread.
 #pragma once
@@ -23,6 +24,7 @@
 namespace lookhaven::recorder {
 
 constexpr std::int64_t kClockStepMs = 2'000;
+constexpr std::int64_t kMaxGapUs = 3'000'000;
 
 // What the recorders of all cameras share. Borrowed: everything in it outlives them.
 struct RecorderContext {
@@ -63,7 +65,10 @@ class CameraRecorder {
     std::int64_t WallOf(std::int64_t timestamp_us) const;
     bool IsWanted() const;
     int Reason() const;
-    bool MustEndBefore(const Frame& frame) const;
+    std::int64_t DistanceAfter(const Frame& frame);
+    bool MustEndBefore(const Frame& frame);
+    bool IsAfterGap(const Frame& frame) const;
+    void Write(const Frame& frame);
     bool IsOverdue(std::int64_t length_us) const;
     void Begin();
     std::optional<EventStart> Prepare(std::int64_t first_us);
@@ -79,6 +84,10 @@ class CameraRecorder {
     std::optional<EventWriter> event_;
     maintenance::RecordingState state_ = maintenance::RecordingState::kReady;
     std::int64_t last_picture_us_ = 0;
+    std::int64_t newest_us_ = 0;    // capture time of the newest picture of the open event
+    std::int64_t previous_us_ = 0;  // capture time of the picture before
+    std::int64_t distance_us_ = 0;  // of pictures, smoothed
+    bool has_gap_ = false;          // in the open event, which ends before the next key frame
     std::int64_t last_flush_us_ = 0;
     std::int64_t next_mount_check_us_ = 0;
     std::int64_t try_again_us_ = 0;

@@ -21,7 +21,8 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
     }
     const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
     CameraPlan result{
-        camera.name, plan.mode, plan.segment_s, plan.pre_s, has_profile ? plan.profile : camera.live_profile, 0, {}};
+        camera.name, plan.mode, plan.segment_s, plan.pre_s, has_profile ? plan.profile : camera.live_profile, 0,
+        {},          {}};
     if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id); mount && mount->enabled) {
         result.mount_id = mount->id;
         result.mount = mount->path;
@@ -49,6 +50,7 @@ void Catalog::Read(store::Store& store) {
     store::Cameras cameras(store);
     store::Mounts mounts(store);
     const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(store).List();
+    const std::string installation = store::Settings(store).Installation();
     auto contents = std::make_shared<CatalogContents>();
     for (const store::Camera& camera : cameras.List()) {
         if (!camera.enabled) {
@@ -62,8 +64,14 @@ void Catalog::Read(store::Store& store) {
             }
             contents->streams.emplace(control::LiveStream{camera.id, profile.number}, std::move(plan));
         }
-        contents->cameras.emplace(camera.id, PlanOf(camera, plans, mounts));
+        CameraPlan plan = PlanOf(camera, plans, mounts);
+        plan.installation = installation;
+        contents->cameras.emplace(camera.id, std::move(plan));
     }
+    for (const store::Mount& mount : mounts.List()) {
+        contents->mounts.emplace(mount.id, mount.enabled);
+    }
+    contents->is_read = true;
     revision_ = revision;
     {
         const std::lock_guard lock(mutex_);

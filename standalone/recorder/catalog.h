@@ -33,11 +33,14 @@ struct CameraPlan {
     int stream = 0;    // the profile that is recorded
     int mount_id = 0;  // 0: there is none to record to
     std::filesystem::path mount;
+    std::string installation;  // whose mounts are recorded to
 };
 
 struct CatalogContents {
     std::map<control::LiveStream, StreamPlan> streams;
     std::map<int, CameraPlan> cameras;  // by id
+    std::map<int, bool> mounts;         // by id; whether enabled
+    bool is_read = false;               // false: the store has not been reached yet
 };
 
 class Catalog {

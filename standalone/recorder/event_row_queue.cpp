@@ -2,8 +2,10 @@
 #include "standalone/recorder/event_row_queue.h"
 
 #include <algorithm>
+#include <limits>
 #include <utility>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 
 namespace lookhaven::recorder {
@@ -12,11 +14,14 @@ namespace {
 
 // With segments of five minutes, recording goes on for twenty minutes without the store.
 constexpr std::size_t kIdsPerCamera = 4;
+// From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a second.
+constexpr std::int64_t kMaxDelayS = 3;
 
 }  // namespace
 
-EventRowQueue::EventRowQueue(const std::string& store_url)
-    : thread_(store_url, "store the events, recording goes on",
+EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder)
+    : role_(recorder, base::MonotonicMicros),
+      thread_(store_url, "store the events, recording goes on",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
 std::optional<int> EventRowQueue::TakeId() {
@@ -56,6 +61,25 @@ void EventRowQueue::Refresh(std::size_t cameras) {
     thread_.Ask();
 }
 
+void EventRowQueue::NoteWritten(int camera, std::int64_t until_s) {
+    const std::lock_guard lock(mutex_);
+    written_until_s_[camera] = until_s - kMaxDelayS;
+}
+
+void EventRowQueue::NoteEnded(int camera) {
+    const std::lock_guard lock(mutex_);
+    written_until_s_.erase(camera);
+}
+
+bool EventRowQueue::HasStored(int camera, std::int64_t until_s) const {
+    const std::lock_guard lock(mutex_);
+    if (!written_until_s_.contains(camera) && !stored_until_s_.contains(camera)) {
+        return stored_s_ >= until_s;
+    }
+    const auto stored = stored_until_s_.find(camera);
+    return stored != stored_until_s_.end() && stored->second >= until_s;
+}
+
 std::vector<store::Mark> EventRowQueue::PendingMarks() const {
     const std::lock_guard lock(mutex_);
     return pending_marks_;
@@ -74,21 +98,43 @@ void EventRowQueue::RequestStop() {
 void EventRowQueue::Work(store::Store& store) {
     store::Events events(store);
     std::vector<int> dirty;
+    std::map<int, std::int64_t> written_until_s;
+    const std::int64_t now_s = base::WallSeconds();
     {
         const std::lock_guard lock(mutex_);
+        written_until_s = written_until_s_;
         for (const auto& [id, entry] : entries_) {
             if (entry.is_dirty) {
                 dirty.push_back(id);
             }
         }
     }
+    bool is_all_stored = true;
     for (const int id : dirty) {
-        StoreRow(events, id);
+        is_all_stored &= StoreRow(events, id);
     }
-    FillReserve(events);
+    if (HoldRole(store)) {
+        FillReserve(events);
+        HoldRole(store);  // tells which ids are taken
+    }
     std::vector<store::Mark> pending = store::Marks(store).Pending();
     const std::lock_guard lock(mutex_);
     pending_marks_ = std::move(pending);
+    if (is_all_stored) {
+        stored_until_s_ = std::move(written_until_s);
+        stored_s_ = now_s - kMaxDelayS;
+    }
+}
+
+bool EventRowQueue::HoldRole(store::Store& store) {
+    const bool is_held = role_.Hold(store, FirstOwnId().value_or(std::numeric_limits<int>::max()));
+    is_refused_ = !is_held;
+    if (!is_held) {
+        const std::lock_guard lock(mutex_);
+        reserve_.clear();
+        first_own_id_.reset();
+    }
+    return is_held;
 }
 
 void EventRowQueue::FillReserve(store::Events& events) {
@@ -113,7 +159,8 @@ void EventRowQueue::FillReserve(store::Events& events) {
     }
 }
 
-void EventRowQueue::StoreRow(store::Events& events, int id) {
+// False when the row must be stored once more.
+bool EventRowQueue::StoreRow(store::Events& events, int id) {
     Entry entry;
     {
         const std::lock_guard lock(mutex_);
@@ -135,7 +182,7 @@ void EventRowQueue::StoreRow(store::Events& events, int id) {
         entries_.at(id).is_stored = true;
         entries_.at(id).is_dirty = true;
         thread_.Ask();
-        return;
+        return false;
     } catch (const store::InvalidRecord& failure) {
         base::LogError("event " + std::to_string(id) + " cannot be stored: " + failure.what());
     } catch (...) {
@@ -148,6 +195,7 @@ void EventRowQueue::StoreRow(store::Events& events, int id) {
     if (!row.recording) {
         entries_.erase(id);
     }
+    return true;
 }
 
 }  // namespace lookhaven::recorder

@@ -9,6 +9,7 @@
 // Thread safety Any thread; nothing here waits for the store.
 #pragma once
 
+#include <atomic>
 #include <deque>
 #include <map>
 #include <mutex>
@@ -16,6 +17,7 @@
 #include <string>
 #include <vector>
 
+#include "standalone/recorder/recorder_role.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -24,8 +26,12 @@ namespace lookhaven::recorder {
 
 class EventRowQueue {
   public:
-    // Starts the thread. Throws std::system_error when no thread can be started.
-    explicit EventRowQueue(const std::string& store_url);
+    // Starts the thread. recorder: names this recorder to others on the same store. Throws std::system_error when no
+    // thread can be started.
+    explicit EventRowQueue(const std::string& store_url, const std::string& recorder = "this recorder");
+
+    // Another recorder records the cameras of this store: no event may begin here, and there are no ids for one.
+    bool IsRefused() const { return is_refused_; }
 
     // An id for an event that begins now; nothing when the reserve is used up because the store has been unavailable.
     std::optional<int> TakeId();
@@ -36,6 +42,12 @@ class EventRowQueue {
 
     // Soon: stores what changed, reads the pending marks and fills the reserve for that many cameras. Does not wait.
     void Refresh(std::size_t cameras);
+
+    // The camera's recording: every row of a frame captured before until_s (UTC) has been Put; or it has ended.
+    void NoteWritten(int camera, std::int64_t until_s);
+    void NoteEnded(int camera);
+    // Whether all such rows are in the store; also for a camera that is not recorded.
+    bool HasStored(int camera, std::int64_t until_s) const;
 
     // The marks whose footage is still to come, as of the last refresh.
     std::vector<store::Mark> PendingMarks() const;
@@ -54,8 +66,9 @@ class EventRowQueue {
     };
 
     void Work(store::Store& store);
+    bool HoldRole(store::Store& store);
     void FillReserve(store::Events& events);
-    void StoreRow(store::Events& events, int id);
+    bool StoreRow(store::Events& events, int id);
 
     mutable std::mutex mutex_;
     std::map<int, Entry> entries_;
@@ -63,6 +76,11 @@ class EventRowQueue {
     std::optional<int> first_own_id_;
     std::size_t wanted_reserve_ = 0;
     std::vector<store::Mark> pending_marks_;
+    std::map<int, std::int64_t> written_until_s_;  // of the cameras that are recorded
+    std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
+    std::int64_t stored_s_ = 0;
+    RecorderRole role_;  // only the thread uses it
+    std::atomic<bool> is_refused_ = false;
     StoreThread thread_;  // last: it uses the others
 };
 

@@ -39,9 +39,19 @@ EventWriter::EventWriter(const EventStart& start, const media::MediaFormat& form
       rows_(rows),
       row_(RowOf(start, format)),
       writer_(PathWithFolder(start, row_), format, start.wall_ms, start.reason),
+      footage_since_s_(row_.start_s),
+      newest_picture_s_(row_.start_s),
       logged_until_s_(row_.start_s) {}
 
-void EventWriter::Write(const Frame& frame) {
+void EventWriter::Write(const Frame& frame, bool after_gap) {
+    if (frame.medium == base::Medium::kVideo) {
+        const std::int64_t picture_s = (start_.wall_ms + (frame.timestamp_us - start_.timestamp_us) / 1000) / 1000;
+        if (after_gap) {
+            before_gaps_.push_back({footage_since_s_, newest_picture_s_ + 1});
+            footage_since_s_ = picture_s;
+        }
+        newest_picture_s_ = std::max(newest_picture_s_, picture_s);
+    }
     writer_.Write(frame.Packet());
     NoteProgress();
 }
@@ -78,9 +88,19 @@ void EventWriter::NoteProgress() {
     if (row_.frame_count > 0) {
         rows_.Put(row_);
     }
-    if (row_.end_s > logged_until_s_ && row_.frame_count > 0) {
-        const std::int64_t begin_s = std::exchange(logged_until_s_, row_.end_s);
-        archive::WriteRecordingLog(start_.mount / std::to_string(start_.camera), begin_s, row_.end_s,
+    if (row_.frame_count > 0) {
+        for (const Seconds& seconds : std::exchange(before_gaps_, {})) {
+            Log(seconds.begin, seconds.end);
+        }
+        Log(footage_since_s_, row_.end_s);
+    }
+}
+
+void EventWriter::Log(std::int64_t begin_s, std::int64_t end_s) {
+    begin_s = std::max(begin_s, logged_until_s_);
+    if (begin_s < end_s) {
+        logged_until_s_ = end_s;
+        archive::WriteRecordingLog(start_.mount / std::to_string(start_.camera), begin_s, end_s,
                                    static_cast<std::uint8_t>(start_.reason));
     }
 }

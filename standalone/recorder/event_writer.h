@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <string>
+#include <vector>
 
 #include "standalone/media/recording_writer.h"
 #include "standalone/recorder/event_row_queue.h"
@@ -34,8 +35,9 @@ class EventWriter {
     const EventStart& Start() const { return start_; }
     bool Takes(const Frame& frame) const { return writer_.Takes(frame.Packet()); }
 
-    // Both throw std::exception when the disk fails; what was flushed before is kept.
-    void Write(const Frame& frame);
+    // Both throw std::exception when the disk fails; what was flushed before is kept. after_gap: the recording log has
+    // nothing between the picture before and this one.
+    void Write(const Frame& frame, bool after_gap = false);
     void Flush();
     // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
     // when the file cannot be finished; then the row describes what was flushed, and recovery or verify finishes the
@@ -45,11 +47,20 @@ class EventWriter {
   private:
     std::int64_t EndS() const;
     void NoteProgress();
+    void Log(std::int64_t begin_s, std::int64_t end_s);
 
     const EventStart start_;
     EventRowQueue& rows_;
     store::Event row_;
     media::RecordingWriter writer_;
+    // Seconds with footage: those before gaps that are still to be logged, then from footage_since_s_ on.
+    struct Seconds {
+        std::int64_t begin = 0;
+        std::int64_t end = 0;
+    };
+    std::vector<Seconds> before_gaps_;
+    std::int64_t footage_since_s_;
+    std::int64_t newest_picture_s_;
     std::int64_t logged_until_s_;
 };
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Hands the cameras' recording states to what writes them to the file for the operator, in a thread of its own.
+// Hands the states of cameras and mounts to what writes them to files for the operator, in a thread of its own.
 //
 // Why so        A slow disk must not hold up the supervisor, which tells viewers every second that the recorder is alive.
 // Thread safety Any thread.
@@ -14,13 +14,19 @@
 #include <thread>
 #include <vector>
 
+#include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/recording_status.h"
 
 namespace lookhaven::recorder {
 
 class RecordingReport {
   public:
-    using States = std::vector<maintenance::RecordingStatus>;
+    struct States {
+        std::vector<maintenance::RecordingStatus> cameras;
+        std::vector<maintenance::MountStatus> mounts;
+
+        bool operator==(const States&) const = default;
+    };
 
     // Starts the thread, which takes no signals and calls write. What write throws is logged, and it is called again for
     // the next states. Throws std::system_error when no thread can be started.

@@ -7,28 +7,25 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/marks.h"
-#include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/recovery.h"
-#include "standalone/maintenance/retention.h"
+#include "standalone/maintenance/recorder_name.h"
 
 namespace lookhaven::recorder {
 
-namespace {
-
-constexpr std::int64_t kRetentionUs = 10'000'000;
-
-}  // namespace
-
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit)
-    : no_data_limit_(no_data_limit),
+    : installation_(installation),
+      no_data_limit_(no_data_limit),
       flush_requests_(installation),
       report_([&installation](const RecordingReport::States& states) {
-          maintenance::WriteRecordingStatus(installation, states);
+          maintenance::WriteRecordingStatus(installation, states.cameras);
+          maintenance::WriteMountStatus(installation, states.mounts);
       }),
-      rows_(installation.StoreUrl()),
-      maintenance_(installation.StoreUrl(), "maintain the recordings",
-                   [this](store::Store& store, const std::stop_token&) { Maintain(store); }) {}
+      rows_(installation.StoreUrl(), maintenance::RecorderName(installation)),
+      missed_marks_(installation.StoreUrl(), "look for marks without footage",
+                    [this](store::Store& store, const std::stop_token&) {
+                        maintenance::CompleteMarks(store, 0, base::WallSeconds(),
+                                                   [this](const store::Mark& mark) { return FootageHasEnded(mark); });
+                    }) {}
 
 // The cameras that a pending mark needs footage of now, and until when.
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
@@ -48,7 +45,8 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     std::erase_if(entries_,
                   [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
     const auto needs = [&](int camera, const CameraPlan& plan) {
-        return plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera);
+        return !rows_.IsRefused() &&
+               (plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera));
     };
     for (auto& [camera, entry] : entries_) {
         const auto plan = catalog.cameras.find(camera);
@@ -61,22 +59,31 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         if (!needs(camera, plan)) {
             continue;
         }
-        Entry& entry = entries_[camera];
-        if (entry.is_ending) {
-            continue;  // started again once it has ended
+        if (!entries_.contains(camera)) {
+            Start("recording of camera " + std::to_string(camera), [&, camera = camera] {
+                const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis,
+                                              [this] { ++space_requests_; },
+                                              std::chrono::microseconds(no_data_limit_).count()};
+                auto worker = std::make_unique<RecordingWorker>(camera, context, flush_requests_);
+                entries_.emplace(camera, Entry{{camera, plan.stream}, std::move(worker)});
+            });
         }
-        if (!entry.worker) {
-            const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis,
-                                          [this] { needs_space_ = true; },
-                                          std::chrono::microseconds(no_data_limit_).count()};
-            entry.worker = std::make_unique<RecordingWorker>(camera, context, flush_requests_);
+        const auto entry = entries_.find(camera);
+        if (entry == entries_.end() || entry->second.is_ending) {
+            continue;  // started again once it can be, or has ended
         }
-        entry.stream = {camera, plan.stream};
-        entry.worker->SetRequest({plan, marked.contains(camera) ? marked.at(camera) : 0});
+        entry->second.stream = {camera, plan.stream};
+        RecordingRequest request{plan, marked.contains(camera) ? marked.at(camera) : 0};
+        if (const auto mount = mounts_.find(plan.mount_id);
+            mount != mounts_.end() && mount->second->Status().state == maintenance::MountState::kInUse) {
+            request.plan.mount_id = 0;
+        }
+        entry->second.worker->SetRequest(request);
     }
     if (entries_.size() > cameras) {
         rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its number
     }
+    ReconcileMounts(catalog);
     AnswerFlushes();
 }
 
@@ -94,10 +101,14 @@ void RecordingSupervisor::AnswerFlushes() {
 
 void RecordingSupervisor::DoEverySecond() {
     rows_.Refresh(entries_.size());
-    maintenance_.Ask();
-    std::vector<maintenance::RecordingStatus> states;
+    missed_marks_.Ask();
+    RecordingReport::States states;
     for (const auto& [camera, entry] : entries_) {
-        states.push_back(entry.worker->State());
+        states.cameras.push_back(entry.worker->State());
+    }
+    for (const auto& [id, mount] : mounts_) {
+        mount->Ask();
+        states.mounts.push_back(mount->Status());
     }
     report_.Publish(std::move(states));
 }
@@ -120,8 +131,11 @@ std::shared_ptr<FrameQueue> RecordingSupervisor::QueueOf(control::LiveStream str
 }
 
 void RecordingSupervisor::RequestStop() {
-    maintenance_.RequestStop();
+    missed_marks_.RequestStop();
     report_.RequestStop();
+    for (const auto& [id, mount] : mounts_) {
+        mount->RequestStop();
+    }
     for (auto& [camera, entry] : entries_) {
         entry.is_ending = true;
         entry.worker->RequestStop();
@@ -135,75 +149,49 @@ bool RecordingSupervisor::HasEnded() {
     if (!std::exchange(stores_last_rows_, true)) {
         rows_.RequestStop();
     }
-    return rows_.HasEnded() && maintenance_.HasEnded() && report_.HasEnded();
+    return rows_.HasEnded() && missed_marks_.HasEnded() && report_.HasEnded() &&
+           std::ranges::all_of(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
 }
 
-void RecordingSupervisor::Maintain(store::Store& store) {
-    const std::int64_t now_s = base::WallSeconds();
-    MarkNewMounts(store);
-    RecoverMounts(store, now_s);
-    maintenance::CompleteMarks(store, now_s);
-    const std::int64_t now_us = base::MonotonicMicros();
-    if (!needs_space_.exchange(false) && now_us < next_retention_us_) {
-        return;
-    }
-    next_retention_us_ = now_us + kRetentionUs;
-    DeleteOld(store, now_s);
-}
-
-// Each mount once, as soon as it is mounted; what failed is tried again.
-void RecordingSupervisor::RecoverMounts(store::Store& store, std::int64_t now_s) {
-    const std::optional<int> first = rows_.FirstOwnId();
-    if (!first) {
-        return;
-    }
-    for (const store::Mount& mount : store::Mounts(store).List()) {
-        if (!recovered_mounts_.contains(mount.id)) {
-            TryOn(mount, "recover the events of", [&] {
-                if (maintenance::Recover(store, mount, *first, now_s)) {
-                    recovered_mounts_.insert(mount.id);
-                }
-            });
+// Starts and stops the maintenance of the mounts to match the catalog.
+void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
+    std::erase_if(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
+    bool are_recovered = catalog.is_read;
+    for (const auto& [id, mount] : mounts_) {
+        if (!catalog.mounts.contains(id)) {
+            mount->RequestStop();
         }
     }
-}
-
-// A mount without any events gets its marker file; one that has events but no marker is an unplugged disk.
-void RecordingSupervisor::MarkNewMounts(store::Store& store) {
-    for (const store::Mount& mount : store::Mounts(store).List()) {
-        TryOn(mount, "mark", [&] {
-            if (mount.enabled && maintenance::MountFolder::HasNoMarker(mount.path) &&
-                store::Events(store).Content(mount.id).events == 0) {
-                maintenance::MountFolder::WriteMarker(mount.path, mount.id);
-            }
-        });
+    for (const auto& [id, is_enabled] : catalog.mounts) {
+        if (!mounts_.contains(id)) {
+            Start("maintenance of mount " + std::to_string(id), [&, id = id] {
+                mounts_.emplace(
+                    id, std::make_unique<MountMaintenance>(
+                            id, MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstOwnId(); },
+                                                   [this](const store::Mark& mark) { return FootageHasEnded(mark); },
+                                                   space_requests_}));
+            });
+        }
+        const auto mount = mounts_.find(id);
+        are_recovered &= !is_enabled || (mount != mounts_.end() && mount->second->IsRecovered());
     }
+    are_mounts_recovered_ = are_recovered;
 }
 
-void RecordingSupervisor::DeleteOld(store::Store& store, std::int64_t now_s) {
-    for (const store::Mount& mount : store::Mounts(store).List()) {
-        TryOn(mount, "delete old events of", [&] {
-            const maintenance::RetentionResult deleted = maintenance::EnforceRetention(store, mount, now_s);
-            if (deleted.events > 0) {
-                base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
-                              " old events");
-            }
-        });
-    }
+// No row will come, neither from this recorder nor of what an earlier one left on a mount.
+bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
+    return (are_mounts_recovered_ || mark.start_s > started_s_) && rows_.HasStored(mark.camera_id, mark.end_s);
 }
 
-// Trouble with one mount must not keep the others from being maintained. Logged once for each reason.
+// A thread that cannot be had costs that camera or mount alone, until it can. Logged once for each reason.
 template <class Work>
-void RecordingSupervisor::TryOn(const store::Mount& mount, const std::string& purpose, Work&& work) {
-    const std::string what = purpose + " mount " + std::to_string(mount.id);
+void RecordingSupervisor::Start(const std::string& what, Work&& start) {
     try {
-        work();
+        start();
         reported_failures_.erase(what);
-    } catch (const store::StoreError&) {
-        throw;
     } catch (const std::exception& failure) {
         if (std::exchange(reported_failures_[what], failure.what()) != failure.what()) {
-            base::LogWarning("cannot " + what + ": " + failure.what());
+            base::LogError("cannot start the " + what + ": " + failure.what());
         }
     }
 }

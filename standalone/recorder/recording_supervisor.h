@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Starts and stops the recording of every camera, and runs the maintenance of the mounts in a thread of its own.
+// Starts and stops the recording of every camera and the maintenance of every mount.
 //
 // Thread safety One thread; no call waits for a disk or the store.
 #pragma once
@@ -11,6 +11,8 @@
 #include <string>
 #include <vector>
 
+#include "standalone/base/clock.h"
+#include "standalone/recorder/mount_maintenance.h"
 #include "standalone/recorder/recording_report.h"
 #include "standalone/recorder/recording_worker.h"
 
@@ -43,23 +45,23 @@ class RecordingSupervisor {
 
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
     void AnswerFlushes();
-    void Maintain(store::Store& store);
-    void RecoverMounts(store::Store& store, std::int64_t now_s);
-    void MarkNewMounts(store::Store& store);
-    void DeleteOld(store::Store& store, std::int64_t now_s);
+    void ReconcileMounts(const CatalogContents& catalog);
+    bool FootageHasEnded(const store::Mark& mark) const;
     template <class Work>
-    void TryOn(const store::Mount& mount, const std::string& purpose, Work&& work);
+    void Start(const std::string& what, Work&& start);
 
+    const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
     RecordingReport report_;
     EventRowQueue rows_;
-    std::atomic<bool> needs_space_ = true;
-    std::set<int> recovered_mounts_;                        // only the maintenance thread uses it
-    std::int64_t next_retention_us_ = 0;                    // likewise
-    std::map<std::string, std::string> reported_failures_;  // likewise; by purpose
-    StoreThread maintenance_;
+    const std::int64_t started_s_ = base::WallSeconds();
+    std::atomic<int> space_requests_ = 0;
+    std::atomic<bool> are_mounts_recovered_ = false;
+    std::map<std::string, std::string> reported_failures_;
     std::map<int, Entry> entries_;
+    std::map<int, std::unique_ptr<MountMaintenance>> mounts_;  // by id
+    StoreThread missed_marks_;
     bool stores_last_rows_ = false;
 };
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/recorder/recording_worker.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "standalone/base/blocked_signals.h"
@@ -49,6 +50,7 @@ void RecordingWorker::Run(const std::stop_token& stop) {
             recording.Take(std::move(*frame));
         }
     }
+    context_.rows.NoteEnded(camera_);
     open_event_ = 0;
     has_ended_ = true;
 }
@@ -63,10 +65,14 @@ void RecordingWorker::Record(CameraRecorder& recording, const std::stop_token& s
                 recording.SetRequest(*std::exchange(new_request_, std::nullopt));
             }
         }
+        // Frames come in the order of capture.
+        const std::int64_t taken_us = frame ? std::min(frame->timestamp_us, now_us) : now_us;
         if (frame) {
             recording.Take(std::move(*frame));
         }
         recording.Tick();
+        const std::int64_t age_ms = (base::MonotonicMicros() - taken_us) / 1000;
+        context_.rows.NoteWritten(camera_, (context_.wall_ms() - age_ms) / 1000);
         Publish(recording);
         if (!frame) {
             AnswerFlush(recording);

@@ -64,18 +64,39 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
     const std::unique_ptr<media::Source> source = media::OpenSource(kinds_, plan_.url, options_, stop);
     for (;;) {
         const media::Packet packet = source->Next();
-        rings.Write(packet, source->Audio());
+        // Recording first: it does not depend on what the live view needs.
         {
             const std::lock_guard lock(mutex_);
             if (recording_) {
                 recording_->Push(packet, source->Audio());
             }
         }
+        WriteRings(rings, packet, source->Audio());
         if (packet.medium == base::Medium::kVideo) {
             backoff_.NotePicture(base::MonotonicMicros());
         }
         if (!std::exchange(live, true)) {
             ReportLive(*packet.format, source->Audio());
+        }
+    }
+}
+
+// Rings that cannot be made are tried again at a key frame, after a pause.
+void StreamWorker::WriteRings(StreamRings& rings, const media::Packet& packet,
+                              const std::optional<media::StreamFormat>& audio) {
+    constexpr std::int64_t kPauseUs = 5'000'000;
+    const bool can_begin = packet.medium == base::Medium::kVideo && packet.key_frame;
+    if (!ring_failure_.empty() && (!can_begin || base::MonotonicMicros() < ring_pause_us_)) {
+        return;
+    }
+    try {
+        rings.Write(packet, audio);
+        ring_failure_.clear();
+    } catch (const std::exception& failure) {
+        rings.EndRun();
+        ring_pause_us_ = base::MonotonicMicros() + kPauseUs;
+        if (std::exchange(ring_failure_, failure.what()) != failure.what()) {
+            base::LogError(Title(stream_, plan_) + "no live view: " + failure.what());
         }
     }
 }

@@ -52,6 +52,7 @@ class StreamWorker {
   private:
     void Run(const std::stop_token& stop);
     void Stream(StreamRings& rings, const std::stop_token& stop);
+    void WriteRings(StreamRings& rings, const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
     void WaitToTryAgain(StreamRings& rings, const std::stop_token& stop);
     void ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio);
     void ReportFailure(const std::string& reason);
@@ -63,6 +64,8 @@ class StreamWorker {
     const media::SourceOptions options_;
     Backoff backoff_;
     std::string reported_failure_;  // empty when the last report was another
+    std::string ring_failure_;      // empty while the rings are written
+    std::int64_t ring_pause_us_ = 0;
     std::mutex mutex_;
     std::shared_ptr<FrameQueue> recording_;
     std::atomic<bool> has_ended_ = false;

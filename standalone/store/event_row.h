@@ -21,4 +21,11 @@ struct Mapping<Event> {
     }
 };
 
+struct EventInRemoval : Event {};
+
+template <>
+struct Mapping<EventInRemoval> : Mapping<Event> {
+    static constexpr const char* kTable = "events_in_removal";
+};
+
 }  // namespace lookhaven::store

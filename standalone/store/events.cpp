@@ -51,6 +51,28 @@ bool SetProgress(Connection& connection, int id, std::int64_t end_s, int frame_c
         durability);
 }
 
+// Runs the statement for each id; returns the number of rows changed.
+int ForEachId(soci::session& sql, std::span<const int> ids, const std::string& text) {
+    int id = 0;
+    int changed = 0;
+    soci::statement statement = Prepare(sql, kRepeatedly, text, id);
+    for (const int next : ids) {
+        id = next;
+        changed += Run(statement);
+    }
+    return changed;
+}
+
+void Move(Connection& connection, std::span<const int> ids, const std::string& from, const std::string& to,
+          const std::string& condition) {
+    const std::string columns = Mapping<Event>::kColumns;
+    const std::string which = " from " + from + " where id = :id" + condition;
+    connection.Write([&](soci::session& sql) {
+        ForEachId(sql, ids, "insert into " + to + " (" + columns + ") select " + columns + which);
+        ForEachId(sql, ids, "delete" + which);
+    });
+}
+
 }  // namespace
 
 int Events::NextId() {
@@ -98,16 +120,20 @@ bool Events::SetArchived(int id, bool archived) {
 }
 
 int Events::Remove(std::span<const int> ids) {
-    return connection_.Write([&](soci::session& sql) {
-        int id = 0;
-        int removed = 0;
-        soci::statement removal = Prepare(sql, kRepeatedly, "delete from events where id = :id", id);
-        for (const int next : ids) {
-            id = next;
-            removed += Run(removal);
-        }
-        return removed;
-    });
+    return connection_.Write(
+        [&](soci::session& sql) { return ForEachId(sql, ids, "delete from events where id = :id"); });
+}
+
+void Events::BeginRemoval(std::span<const int> ids) {
+    Move(connection_, ids, "events", "events_in_removal", " and recording = 0 and archived = 0");
+}
+
+void Events::FinishRemoval(std::span<const int> ids) {
+    connection_.Write([&](soci::session& sql) { ForEachId(sql, ids, "delete from events_in_removal where id = :id"); });
+}
+
+void Events::CancelRemoval(std::span<const int> ids) {
+    Move(connection_, ids, "events_in_removal", "events", "");
 }
 
 int Events::RemoveDemo() {

@@ -2,8 +2,9 @@
 //
 // Recorded events: a row for each file of a camera's recording.
 //
-// Why so        The file is the record, the row is how it is found. So a row is made after its file exists and removed
-//               before the file goes: a row never points at nothing. There is no row per frame.
+// Why so        The file is the record, the row is how it is found. So a row is made after its file exists, and while
+//               the file is being removed, the row is in removal, where no search finds it: a row that is found never
+//               points at nothing. There is no row per frame.
 // Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found
 //                   by looking at a bounded stretch of the index (camera, start), however many events there are.
 //               (2) Ids come from one counter with those of marks and are never used twice.
@@ -87,8 +88,15 @@ class Events {
     bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
     bool SetArchived(int id, bool archived);
 
-    // In one transaction; returns the number of rows removed. The caller then removes the files.
+    // In one transaction; returns the number of rows removed. For rows without a file.
     int Remove(std::span<const int> ids);
+
+    // Removing files with their rows. Until FinishRemoval or CancelRemoval the rows are found by InRemoval alone. Each is
+    // one transaction. BeginRemoval leaves out growing and archived events: remove the files of InRemoval only.
+    void BeginRemoval(std::span<const int> ids);
+    void FinishRemoval(std::span<const int> ids);
+    void CancelRemoval(std::span<const int> ids);  // the rows are as before
+    std::vector<Event> InRemoval(int mount_id);    // by id
     // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call
     // removes.
     int RemoveDemo();
@@ -102,8 +110,9 @@ class Events {
 
     // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();
-    // Finished events of the mount that are neither archived nor demo, the oldest start first.
-    std::vector<Event> Oldest(int mount_id, int limit);
+    // Finished events of the mount that are neither archived nor demo, with ids above after_id, by id: in the order in
+    // which they were recorded, whatever the clock said.
+    std::vector<Event> Oldest(int mount_id, int after_id, int limit);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.

@@ -161,10 +161,11 @@ std::vector<Mark> Marks::Pending() {
     return connection_.FetchAll<Mark>("where state = 0 order by end_s");
 }
 
-std::vector<Mark> Marks::EndedBy(int camera_id, std::int64_t time_s, int limit) {
-    return connection_.FetchAll<Mark>("where camera_id = :camera and start_s <= :started and end_s <= :ended"
-                                      " and state <> 0 and demo = 0 order by start_s limit :limit",
-                                      camera_id, time_s, time_s, limit);
+std::vector<Mark> Marks::EndedBy(int camera_id, std::int64_t time_s, const Mark& after, int limit) {
+    return connection_.FetchAll<Mark>(
+        "where camera_id = :camera and start_s >= :from and (start_s > :after or id > :id) and start_s <= :started"
+        " and end_s <= :ended and state <> 0 and demo = 0 order by start_s, id limit :limit",
+        camera_id, after.start_s, after.start_s, after.id, time_s, time_s, limit);
 }
 
 std::vector<Mark> Marks::OnMount(int mount_id) {

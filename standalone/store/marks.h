@@ -95,9 +95,9 @@ class Marks {
     std::vector<Mark> List(const MarkFilter& filter);
     // What the recorder has to save, by the end of the span. Costs nothing when there is none.
     std::vector<Mark> Pending();
-    // Marks of the camera whose footage ended at or before that time, the oldest first, without demo and pending ones:
-    // what retention removes once it has removed the footage.
-    std::vector<Mark> EndedBy(int camera_id, std::int64_t time_s, int limit);
+    // Marks of the camera whose footage ended at or before that time, by start and id, without demo and pending ones:
+    // what retention removes once it has removed the footage. Those after that mark; from the first for an empty one.
+    std::vector<Mark> EndedBy(int camera_id, std::int64_t time_s, const Mark& after, int limit);
     // Every saved mark of the mount but demo ones, by id.
     std::vector<Mark> OnMount(int mount_id);
 

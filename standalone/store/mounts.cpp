@@ -127,7 +127,17 @@ void Mounts::Remove(int id, bool forget_events) {
         if (held > 0) {
             throw InvalidRecord("the mount \"" + mount.name + "\" holds " + std::to_string(held) + " recordings");
         }
+        Execute(sql, "delete from events_in_removal where mount_id = :id", id);
         Execute(sql, "delete from mounts where id = :id", id);
+    });
+}
+
+void Mounts::ReserveIds(int camera, int event) {
+    connection_.Write([&](soci::session& sql) {
+        for (const auto& [counter, id] : {std::pair("camera", camera), std::pair("event", event)}) {
+            Execute(sql, "update counters set value = :id where name = :name and value < :at_least", id,
+                    std::string(counter), id);
+        }
     });
 }
 

@@ -40,6 +40,10 @@ class Mounts {
     // one that holds events or saved marks.
     void Remove(int id, bool forget_events);
 
+    // Keeps later cameras and events from getting numbers that footage on a mount has already: raises the counters to
+    // these where they are below.
+    void ReserveIds(int camera, int event);
+
     std::optional<Mount> Find(int id);
     // The default for id 0.
     std::optional<Mount> FindForPlan(int id);

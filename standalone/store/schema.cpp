@@ -120,11 +120,30 @@ constexpr const char* kReporters[] = {
     "create index marks_by_reporter on marks (reporter_id, reported_s) where reporter_id <> 0",
 };
 
+constexpr const char* kDisks[] = {
+    // Rows whose files retention is removing: out of every search, and restored where a file cannot be removed.
+    "create table events_in_removal (id integer not null primary key, camera_id integer not null,"
+    " mount_id integer not null, start_s bigint not null, end_s bigint not null, recording integer not null,"
+    " reason integer not null, frame_count integer not null, size_bytes bigint not null, video_type integer not null,"
+    " audio_codec text not null, width integer not null, height integer not null, path text not null,"
+    " archived integer not null, demo integer not null)",
+    "drop index events_by_age",
+    // Partial, so that growing and demo events cost nothing here. With the size, so that the sum of a mount is
+    // read from the index alone.
+    "create index events_by_order on events (mount_id, id, size_bytes)"
+    " where recording = 0 and archived = 0 and demo = 0",
+
+    "create table recorder_lease (count bigint not null primary key, holder text not null,"
+    " first_own_id integer not null)",
+    "insert into recorder_lease (count, holder, first_own_id) values (0, '', 2147483647)",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
     {"e-maps, their devices, recording servers", kEmaps},
     {"who reported a mark, and who may", kReporters},
+    {"events in removal, the order of recording, the recorder's role", kDisks},
 };
 
 }  // namespace

@@ -42,6 +42,12 @@ void Settings::Set(std::string_view key, std::string_view value) {
     });
 }
 
+std::string Settings::Installation() {
+    return connection_.Read([](soci::session& sql) {
+        return FetchOne<std::string>(sql, "select value from settings where name = 'installation'").value();
+    });
+}
+
 std::int64_t Settings::Revision() {
     return connection_.FetchOne<std::int64_t>("select value from counters where name = 'revision'").value();
 }

@@ -24,6 +24,9 @@ class Settings {
     // Throws InvalidRecord.
     void Set(std::string_view key, std::string_view value);
 
+    // The random id of this installation, made by Store::Migrate: what the markers of its mounts name.
+    std::string Installation();
+
     // Grows with every change of what is configured: cameras, mounts, plans, groups, e-maps, servers, settings; not
     // with events, accounts or device states. Reads one row.
     std::int64_t Revision();

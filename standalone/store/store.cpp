@@ -9,10 +9,13 @@
 #include "standalone/base/file.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/schema.h"
+#include "standalone/store/secret.h"
 
 namespace lookhaven::store {
 
 namespace {
+
+constexpr std::size_t kInstallationIdBytes = 16;
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
@@ -103,7 +106,10 @@ int Store::Migrate(const std::string& url) {
         if (version > SchemaVersion()) {
             ThrowNewer(version);
         }
-        return version == SchemaVersion() ? 0 : TakeSteps(sql, version);
+        const int steps = version == SchemaVersion() ? 0 : TakeSteps(sql, version);
+        Execute(sql, "insert into settings (name, value) values ('installation', :id) on conflict (name) do nothing",
+                RandomHex(kInstallationIdBytes));
+        return steps;
     });
 }
 

@@ -130,6 +130,9 @@ TEST(RecordingReader, MovesOnWhileASlowCameraSaysNothing) {
     const RecordingReader recording(folder / "a.mkv");
     EXPECT_GE(recording.FrameCount(), 7);
     EXPECT_LE(recording.FrameCount(), 10) << "ahead of what may still come";
+    FrameIndexWriter stepped = BeginRecording(folder / "b.mkv", base::WallMillis() - 3'600'000);
+    stepped.Append(FramesAt({0}));
+    EXPECT_LE(RecordingReader(folder / "b.mkv").FrameCount(), 15) << "the clock was set an hour ahead";
 }
 
 // The wall clock of three recordings, the last after the clock was set back.

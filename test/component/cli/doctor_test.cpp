@@ -2,6 +2,7 @@
 //
 // The doctor: sees each thing that is wrong, says what to do, and is content when nothing is.
 #include <cstring>
+#include <fstream>
 #include <functional>
 #include <thread>
 
@@ -111,8 +112,10 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
         {"mount gone", [&] { std::filesystem::rename(home_ / "recordings", home_ / "away"); }, "is not there",
          "mount its disk", [&] { std::filesystem::rename(home_ / "away", home_ / "recordings"); }},
         {"another folder", [&] { std::filesystem::remove(home_ / "recordings" / ".lookhaven-mount"); },
-         "not the folder that was added", "mount set",
-         [&] { EXPECT_EQ(Run("mount set 2 --path " + (home_ / "recordings").string()).code, 0); }},
+         "its disk is not mounted", "do: mount its disk\n",
+         [&] { std::ofstream(home_ / "recordings" / ".lookhaven-mount") << "lookhaven mount 2 of another\n"; }},
+        {"another's folder", [] {}, "another mount or installation", "mount set 2 --take-over",
+         [&] { EXPECT_EQ(Run("mount set 2 --take-over").code, 0); }},
         {"above the limit",
          [&] {
              Sql("update mounts set max_bytes = 10")();
@@ -122,6 +125,8 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
              store::Events(store).AddAll(std::vector{event});
          },
          "above its limit", "raise the limit", Sql("delete from events")},
+        {"another recorder", Sql("update recorder_lease set holder = '/var on nvr2'"), "/var on nvr2",
+         "stop one of the two", Sql("update recorder_lease set holder = ''")},
         {"mute host", [&] { host_.reset(), host_ = std::make_unique<FakeHost>(socket, false); }, "does not answer",
          "start the server", [&] { host_.reset(); }},
         {"no host", [&] { std::filesystem::remove(socket); }, "does not answer", "start the server",

@@ -10,11 +10,13 @@
 #include "standalone/archive/layout.h"
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/maintenance/mount_lock.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
+#include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 #include "test/component/cli/program.h"
 #include "test/support/footage/clips.h"
@@ -146,7 +148,8 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
     Play({{"mount add " + (folder_ / "none").string(), 66, "no folder"},
           {"mount add " + (folder_ / "file").string(), 66, "no folder"},
           {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "Added mount disk with id"},
-          {"mount add " + (folder_ / "link").string() + " --name other", 65, "inside each other"},
+          {"mount add " + (folder_ / "link").string() + " --name other", 65, "belongs to mount 2"},
+          {"mount add " + (folder_ / "link").string() + " --name other --take-over", 65, "inside each other"},
           {"mount add " + disk + " --limit 5X", 64, "a size looks like"},
           {"mount list", 0, "1.5 TiB  30d"},
           {"mount set 9 --name x", 66, "no mount 9"},
@@ -155,7 +158,19 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
     store::Mounts mounts(store);
     const int id = mounts.List().back().id;
     const std::string number = std::to_string(id);
-    EXPECT_EQ(base::ReadFile(disk + "/.lookhaven-mount"), "lookhaven mount " + number + "\n");
+    EXPECT_EQ(base::ReadFile(disk + "/.lookhaven-mount"),
+              "lookhaven mount " + number + " of " + store::Settings(store).Installation() + "\n");
+    std::filesystem::create_directories(folder_ / "foreign/41/2026-03-01");
+    std::ofstream(folder_ / "foreign/41/2026-03-01/081500-4711.mkv") << "x";
+    std::ofstream(folder_ / "foreign/.lookhaven-mount") << "lookhaven mount " + number + " of another\n";
+    const std::string foreign = (folder_ / "foreign").string();
+    Play({{"mount add " + foreign, 65, "another installation"},
+          {"mount set " + number + " --path " + foreign, 65, "--take-over"},
+          {"mount set " + number + " --path " + (home_ / "recordings").string(), 65, "belongs to mount 1"},
+          {"mount add " + foreign + " --take-over", 0, "Added mount foreign"}});
+    EXPECT_GT(store::Events(store).NextId(), 4711) << "footage there keeps its numbers";
+    Play({{"camera add --name New --source test:mjpeg --type mjpeg --json", 0, "\"id\" : 42"}});
+
     Play({{"mount set " + number + " --default --limit 0 --name Disk --disable --json", 0, "\"max_bytes\" : 0"},
           {"mount list", 0, "default disabled"},
           {"camera set 1 --mount 1 --json", 0, "\"mount_id\" : 1"},
@@ -237,10 +252,13 @@ TEST_F(RecordingsTest, ARecordingIsTakenInExportedAndMissedWhenItIsGone) {
     const std::string number = std::to_string(id);
     const auto whole = folder_ / "whole.mkv";
     const auto silent = folder_ / "silent.mkv";
-    Play({{"verify", 1, "verify --repair"},
-          {"event show " + number, 66, "no event"},
-          {"verify --repair", 0, "done:"},
-          {"verify --json", 0, "\"frames\" : 100"},
+    Play({{"verify", 1, "verify --repair"}, {"event show " + number, 66, "no event"}, {"verify --repair", 0, "done:"}});
+    {
+        maintenance::MountLock other;
+        EXPECT_TRUE(other.Hold(home_ / "recordings"));
+        Play({{"verify", 0, "1 events"}, {"verify --repair", 65, "another state folder"}});
+    }
+    Play({{"verify --json", 0, "\"frames\" : 100"},
           {"event show " + number, 0, "H.264 160x120, 100 frames", "cannot be read"},
           {"event export " + number + " " + whole.string(), 0, "was exported"},
           {"event export " + number + " " + whole.string(), 73, "already a file"},

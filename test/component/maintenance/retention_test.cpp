@@ -15,7 +15,10 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/base/installation.h"
+#include "standalone/maintenance/clock_watch.h"
+#include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/verify.h"
 #include "standalone/store/marks.h"
 #include "test/support/folder.h"
 #include "test/support/footage/footage.h"
@@ -33,13 +36,13 @@ constexpr std::int64_t kNow = kNoon + 86400;
 
 class RetentionTest : public testing::Test {
   protected:
-    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId()); }
+    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkOf(footage_.Records(), footage_.MountId())); }
 
-    RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0) {
+    RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
-        return EnforceRetention(footage_.Records(), mount, kNow);
+        return EnforceRetention(footage_.Records(), mount, kNow, age_limit);
     }
 
     std::vector<int> Left() {
@@ -62,8 +65,8 @@ class RetentionTest : public testing::Test {
 };
 
 TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
-    const int second = footage_.Record(1, kNoon + 100, 60);
     const int first = footage_.Record(2, kNoon, 60);
+    const int second = footage_.Record(1, kNoon + 100, 60);
     const int third = footage_.Record(1, kNoon + 160, 60);
     const std::vector<fs::path> gone = {footage_.FileOf(first), footage_.FileOf(second)};
     EXPECT_EQ(Run(3 * kEventBytes).events, 0) << "as much as is allowed";
@@ -91,6 +94,36 @@ TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {
     EXPECT_FALSE(store::Events(footage_.Records()).Find(old));
 }
 
+TEST_F(RetentionTest, AWrongDateNeitherDeletesNorKeeps) {
+    const int future = footage_.Record(1, kNow + 400 * 86400, 60);
+    const int old = footage_.Record(1, kNow - 500, 60);
+    const int young = footage_.Record(1, kNow - 60, 60);
+    const int past = footage_.Record(1, 1000, 60);  // the clock began at 1970
+    EXPECT_EQ(Run(0, 100, AgeLimit::kWaits).events, 0);
+    EXPECT_EQ(Run(0, 100).events, 2) << future << " is older than " << old;
+    EXPECT_THAT(Left(), ElementsAre(young, past));
+    EXPECT_EQ(Run(kEventBytes).events, 1);
+    EXPECT_THAT(Left(), ElementsAre(past)) << "recorded last";
+}
+
+TEST(ClockWatch, TrustsAnHourWithoutAStepOfADay) {
+    ClockWatch watch;
+    constexpr std::int64_t kHourUs = std::int64_t{3600} * 1'000'000;
+    const struct {
+        std::int64_t monotonic_us, wall_s;
+        bool is_trusted;
+    } rows[] = {{5, 1000, false},
+                {5 + kHourUs - 1, 4599, false},
+                {5 + kHourUs, 4600, true},
+                {5 + kHourUs, 4600 + 86'000, true},  // put right
+                {6 + kHourUs, kNoon, false},
+                {6 + 2 * kHourUs, kNoon + 3600, true},
+                {7 + 2 * kHourUs, 0, false}};
+    for (const auto& row : rows) {
+        EXPECT_EQ(watch.IsTrusted(row.monotonic_us, row.wall_s), row.is_trusted) << row.monotonic_us;
+    }
+}
+
 TEST_F(RetentionTest, WhatIsKeptOnPurposeOrUnknownStays) {
     const int archived = footage_.Record(1, kNoon, 60);
     const int growing = footage_.Record(1, kNoon + 100, 60);
@@ -113,7 +146,9 @@ TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
     const int event = footage_.Record(1, kNoon, 60);
     for (const auto& hide : std::initializer_list<std::function<void()>>{
              [&] { fs::remove(footage_.Mount() / ".lookhaven-mount"); },
-             [&] { MountFolder::WriteMarker(footage_.Mount(), footage_.MountId() + 1); },
+             [&] {
+                 MountFolder::WriteMarker(footage_.Mount(), {footage_.MountId(), "somebody else's"});
+             },
              [&] { fs::rename(footage_.Mount(), folder_ / "unplugged"); },
          }) {
         hide();
@@ -133,6 +168,18 @@ TEST_F(RetentionTest, AnEventWhoseFileCannotBeRemovedKeepsItsRow) {
     EXPECT_EQ(footage_.FileOf(stuck), file);
     fs::remove(file);
     EXPECT_EQ(Run(1).events, 2);
+}
+
+TEST_F(RetentionTest, WhatACrashLeftInRemovalIsFinished) {
+    const int first = footage_.Record(1, kNoon, 60);
+    const int second = footage_.Record(1, kNoon + 60, 60);
+    const fs::path file = footage_.FileOf(second);
+    fs::remove(footage_.FileOf(first));
+    store::Events events(footage_.Records());
+    events.BeginRemoval(std::array{first, second});
+    EXPECT_THAT(Verify(footage_.Records(), false).faults, IsEmpty());
+    EXPECT_EQ(Run(0).events, 2);
+    EXPECT_FALSE(fs::exists(file) || !events.InRemoval(footage_.MountId()).empty());
 }
 
 // Root may pass every permission: takes that away until destruction.
@@ -170,6 +217,42 @@ TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
     EXPECT_FALSE(marks.Find(store::MarkKind::kAlert, mark));
     EXPECT_THAT(Left(), IsEmpty());
     EXPECT_FALSE(fs::exists(footage_.Mount() / "1"));
+}
+
+TEST_F(RetentionTest, MarksThatArchivedFootageKeepsHideNoOther) {
+    const int archived = footage_.Record(1, kNoon, 60);
+    const int plain = footage_.Record(1, kNoon + 60, 60);
+    store::Events(footage_.Records()).SetArchived(archived, true);
+    for (int i = 0; i < 120; ++i) {
+        footage_.Mark(1, 1, kNoon + 10, 5, "kept", archived);
+    }
+    footage_.Mark(1, 1, kNoon + 80, 5, "gone", plain);
+    EXPECT_EQ(Run(1).marks, 1);
+}
+
+TEST_F(RetentionTest, AMarkIsCompleteOnceNoRowOfItCanCome) {
+    const int event = footage_.Record(1, kNoon, 60);
+    store::Marks marks(footage_.Records());
+    const auto add = [&](int camera, std::int64_t at_s) {
+        return marks.Add(store::MarkKind::kAlert, camera, at_s, 1, "").id;
+    };
+    const int whole = add(1, kNoon + 30);
+    const int partly = add(1, kNoon + 58);  // its row ends before it
+    const int none = add(2, kNoon + 30);
+    bool ended = false;
+    const auto complete = [&] {
+        for (const int mount : {footage_.MountId(), 0}) {
+            CompleteMarks(footage_.Records(), mount, kNow, [&](const store::Mark&) { return ended; });
+        }
+        std::string states;
+        for (const int id : {whole, partly, none}) {
+            states += std::string(NameOf(marks.Find(store::MarkKind::kAlert, id)->state)) + " ";
+        }
+        return states;
+    };
+    EXPECT_EQ(complete(), "saved pending pending ") << event;
+    ended = true;
+    EXPECT_EQ(complete(), "saved saved missed ");
 }
 
 TEST_F(RetentionTest, APathThatLeadsAwayRemovesNothing) {

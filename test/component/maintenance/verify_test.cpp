@@ -15,6 +15,7 @@
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/recorder_lease.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/footage/footage.h"
@@ -32,7 +33,7 @@ class VerifyTest : public testing::Test {
   protected:
     // An installation with one recording, its row and an alert over it.
     VerifyTest() {
-        MountFolder::WriteMarker(footage_.Mount(), footage_.MountId());
+        MountFolder::WriteMarker(footage_.Mount(), MarkOf(footage_.Records(), footage_.MountId()));
         event_ = footage_.Record(1, kStartS, 4);
         file_ = footage_.FileOf(event_);
         fs::remove(file_);
@@ -186,9 +187,29 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("adopted"));
     EXPECT_FALSE(fs::exists(foreign));
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
+    // A number that a restored store gave out anew, and one that a recorder may still give out.
+    store::Events events(Records());
+    const fs::path taken = file_.parent_path() / ("130000-" + std::to_string(event_) + ".mkv");
+    const int reserved = events.NextIds(2);
+    const fs::path in_reserve = file_.parent_path() / ("140000-" + std::to_string(reserved) + ".mkv");
+    store::RecorderLease(Records()).Take(0, "recorder", reserved);
+    for (const fs::path& file : {taken, in_reserve}) {
+        fs::copy(file_, file);
+    }
+    fs::create_directory(footage_.Mount() / "12");
+    Age();
+    for (const Fault& fault : Verify(Records(), true).faults) {
+        EXPECT_THAT(fault.done, HasSubstr("adopted"));
+    }
+    EXPECT_FALSE(fs::exists(taken) || fs::exists(in_reserve) || events.Find(reserved));
+    EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
+    store::Camera camera;
+    camera.name = "New";
+    camera.profiles = {{0, "test:mjpeg", 0, 0, 0}};
+    EXPECT_EQ(store::Cameras(Records()).Add(camera), 13) << "not the number of footage that is there";
     fs::remove(footage_.Mount() / ".lookhaven-mount");
     const auto before = State();
-    EXPECT_THAT(Verify(Records(), true).faults.front().problem, HasSubstr("is not there, with 2 events"));
+    EXPECT_THAT(Verify(Records(), true).faults.front().problem, HasSubstr("is not there, with 4 events"));
     EXPECT_EQ(State(), before);
 }
 

@@ -230,6 +230,13 @@ TEST(CloseCrashed, SavesWhatIsWholeOfACutOrDamagedRecording) {
             ASSERT_GE(saved, in_file - 20) << "more than the last cluster is gone";
         }
     }
+    // A damaged cluster costs its own frames, up to the next key frame.
+    std::string damaged = bytes;
+    damaged.at(damaged.find("\x1f\x43\xb6\x75", bytes.size() / 2)) ^= 4;
+    Write(path, damaged);
+    std::filesystem::remove(archive::IndexPathOf(path));
+    EXPECT_GE(archive::CloseCrashed(path).frame_count, 60);
+    EXPECT_EQ(Entries(path).back(), frames.back());
     EXPECT_THROW(archive::CloseCrashed(folder / "none.mkv"), std::system_error);
 }
 

@@ -35,17 +35,20 @@ TEST(SourceUrl, KeepsSecretsOutOfTexts) {
 
 TEST(Timeline, FollowsTheSourceAndSurvivesItsJumps) {
     Timeline timeline;
-    const std::int64_t rows[][3] = {
-        // source, arrival, expected
+    const std::int64_t rows[][4] = {
+        // source, arrival, expected, whether it is a key frame
         {5'000'000, 100'000'000, 100'000'000},
         {5'040'000, 100'090'000, 100'040'000},  // late on the way
         {5'020'000, 100'095'000, 100'020'000},  // sound beside it
         {95'000'000'000, 100'200'000, 100'200'000},
         {95'000'040'000, 100'240'000, 100'240'000},
         {0, 100'300'000, 100'300'000},
+        {2'300'000, 101'400'000, 102'600'000},        // its clock has become fast …
+        {2'400'000, 101'490'000, 101'490'000, true},  // … which a key frame puts right
+        {2'300'000, 101'495'000, 101'390'000},
     };
-    for (const auto& [source, arrival, expected] : rows) {
-        EXPECT_EQ(timeline.Map(source, arrival), expected) << source;
+    for (const auto& [source, arrival, expected, is_key] : rows) {
+        EXPECT_EQ(timeline.Map(source, arrival, is_key != 0), expected) << source;
     }
 }
 

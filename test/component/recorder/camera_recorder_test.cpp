@@ -7,6 +7,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/archive/recording_log.h"
 #include "standalone/archive/recording_reader.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "test/support/footage/archive_folder.h"
@@ -27,9 +28,9 @@ class CameraRecorderTest : public testing::Test {
     CameraRecorderTest() {
         for (const int mount : {1, 2}) {
             fs::create_directory(MountPath(mount));
-            maintenance::MountFolder::WriteMarker(MountPath(mount), mount);
+            maintenance::MountFolder::WriteMarker(MountPath(mount), {mount, "here"});
         }
-        request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1)};
+        request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1), "here"};
         recorder_.SetRequest(request_);
     }
 
@@ -47,7 +48,8 @@ class CameraRecorderTest : public testing::Test {
             now_us_ += 1'000'000 / kFps;
             if (with_pictures) {
                 const test::OwnedPacket& packet = clip_.packets[fed_++ % clip_.packets.size()];
-                recorder_.Take({format_, packet.medium, packet.data, now_us_, packet.key_frame});
+                taken_late_us_ = packet.key_frame ? late_us_ : taken_late_us_;
+                recorder_.Take({format_, packet.medium, packet.data, now_us_ - taken_late_us_, packet.key_frame});
             }
             recorder_.Tick();
         }
@@ -70,13 +72,15 @@ class CameraRecorderTest : public testing::Test {
     const test::ArchiveFolder folder_;
     std::int64_t now_us_ = 1'000'000'000;
     std::int64_t wall_ahead_ms_ = kNoonMs;  // of the monotonic clock
+    std::int64_t late_us_ = 0;              // of the pictures from the next key frame on
+    std::int64_t taken_late_us_ = 0;
     int rooms_wanted_ = 0;
     std::size_t fed_ = 0;
     EventRowQueue rows_{StoreUrl()};
     RecordingRequest request_;
     CameraRecorder recorder_{7,
                              {rows_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
-                              [this] { ++rooms_wanted_; }, 1'000'000}};
+                              [this] { ++rooms_wanted_; }, 10'000'000}};
     const test::Clip& clip_ = test::MakeClip(test::kH264);  // a key frame each second
     const std::shared_ptr<const media::MediaFormat> format_ =
         std::make_shared<media::MediaFormat>(media::MediaFormat{clip_.format.video, {}});
@@ -96,6 +100,8 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         {"the clock jumps", [&] { wall_ahead_ms_ += 3'000; }, {3, 7}, 3'000},
         {"the clock is set back", [&] { wall_ahead_ms_ -= 3'600'000; }, {3, 7}, -3'600'000},
         {"the clock is put right", [&] { wall_ahead_ms_ -= 1'900; }, {10}, -1'900},
+        {"the pictures' times go back", [&] { late_us_ = 900'000; }, {3, 7}, -900},
+        {"the camera stalls", [&] { Pass(4, false); }, {3, 7}, 4'000},
         {"another mount", [&] { request_.plan.mount_id = 2, request_.plan.mount = MountPath(2); }, {3, 7}},
     };
     std::size_t known = 0;
@@ -108,6 +114,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         recorder_.SetRequest(request_);
         Pass(7.52);
         recorder_.Close();
+        late_us_ = 0;
         EXPECT_EQ(recorder_.State(), RecordingState::kReady);
         const std::vector<fs::path> files = Files();
         ASSERT_EQ(files.size() - known, row.seconds.size());
@@ -118,6 +125,11 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
             EXPECT_FALSE(event.Grows());
             EXPECT_NEAR(static_cast<double>(event.StartWallMs() - expected_ms), 40, 1);
             expected_ms += seconds * 1000 + (expected_ms == begin_ms ? row.step_ms : 0);
+        }
+        if (row.step_ms == 4'000) {
+            std::vector<std::uint8_t> log(14);
+            archive::ReadRecordingLog(MountPath(1) / "7", begin_ms / 1000, log);
+            EXPECT_THAT(log, testing::ElementsAre(1, 1, 1, 0, 0, 0, 1, 1, 1, 1, 1, 1, 1, 1));
         }
         request_.plan.segment_s = 60;
         recorder_.SetRequest(request_);
@@ -149,15 +161,20 @@ TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
          [&] { request_.plan.mode = store::RecordMode::kAlways; }},
         {RecordingState::kMountGone, true, [&] { fs::rename(MountPath(1), hidden); },
          [&] { fs::rename(hidden, MountPath(1)); }},
-        {RecordingState::kMountGone, true, [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 9); },
-         [&] { maintenance::MountFolder::WriteMarker(MountPath(1), 1); }},
+        {RecordingState::kMountGone, true,
+         [&] {
+             maintenance::MountFolder::WriteMarker(MountPath(1), {1, "elsewhere"});
+         },
+         [&] {
+             maintenance::MountFolder::WriteMarker(MountPath(1), {1, "here"});
+         }},
         {RecordingState::kNoMount, true, [&] { request_.plan.mount_id = 0; }, [&] { request_.plan.mount_id = 1; }},
     };
     for (const Row& row : rows) {
         SCOPED_TRACE(NameOf(row.state));
         row.happens();
         recorder_.SetRequest(request_);
-        Pass(3, row.with_pictures);
+        Pass(row.with_pictures ? 3 : 11, row.with_pictures);
         EXPECT_EQ(recorder_.State(), row.state);
         EXPECT_EQ(recorder_.OpenEvent(), 0);
         row.ends();

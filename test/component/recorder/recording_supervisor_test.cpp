@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maintenance of several mounts, one of which fails; a disk that hangs.
+// Maintenance of several mounts, one of which fails; a disk that hangs; and two recorders on one store.
 #include "standalone/recorder/recording_supervisor.h"
 
 #include <future>
@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/wait.h"
@@ -15,15 +16,17 @@
 namespace lookhaven::recorder {
 namespace {
 
+namespace fs = std::filesystem;
+
 TEST(RecordingReport, HoldsNobodyUpWhileTheDiskHangs) {
     std::promise<void> disk;
     std::vector<std::size_t> written;
     RecordingReport report([&, ready = disk.get_future().share()](const RecordingReport::States& states) {
         ready.wait();
-        written.push_back(states.size());
+        written.push_back(states.cameras.size());
     });
     for (const std::size_t cameras : {1U, 1U, 2U, 3U}) {
-        report.Publish(RecordingReport::States(cameras));
+        report.Publish({std::vector<maintenance::RecordingStatus>(cameras), {}});
     }
     report.RequestStop();
     EXPECT_FALSE(report.HasEnded()) << "it waits for the disk in its own thread";
@@ -32,27 +35,98 @@ TEST(RecordingReport, HoldsNobodyUpWhileTheDiskHangs) {
     EXPECT_EQ(written.back(), 3U);
 }
 
-TEST(RecordingSupervisor, MaintainsTheMountsBesideOneThatFails) {
-    const test::ArchiveFolder home;
-    base::Installation::CreateFolders(home.Path());
-    const base::Installation installation(home.Path());
-    store::Store::Migrate(installation.StoreUrl());
-    store::Store store = store::Store::Open(installation.StoreUrl());
-    std::filesystem::create_directory(home / "disk");
-    int id = 0;
-    // Nobody can create a file in /proc.
-    for (const std::filesystem::path& folder : {std::filesystem::path("/proc"), home / "disk"}) {
+class RecordingSupervisorTest : public testing::Test {
+  protected:
+    RecordingSupervisorTest() { base::Installation::CreateFolders(home_.Path()); }
+
+    int AddMount(const fs::path& folder, const std::string& owner) {
+        fs::create_directory(folder);
         store::Mount mount;
         mount.name = folder.filename();
         mount.path = folder;
-        id = store::Mounts(store).Add(mount);
+        mount.id = store::Mounts(store_).Add(mount);
+        maintenance::MountFolder::WriteMarker(folder, {mount.id, owner});
+        return mount.id;
     }
-    RecordingSupervisor supervisor(installation, std::chrono::seconds(1));
+
+    void SetPath(int id, const fs::path& path) {
+        store::Mount mount = store::Mounts(store_).Find(id).value();
+        mount.path = path;
+        store::Mounts(store_).Update(mount);
+    }
+
+    const test::ArchiveFolder home_;
+    const base::Installation installation_{home_.Path()};
+    store::Store store_{
+        (store::Store::Migrate(installation_.StoreUrl()), store::Store::Open(installation_.StoreUrl()))};
+};
+
+TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
+    const std::string own = maintenance::MarkOf(store_, 1).installation;
+    const int failing = AddMount(home_ / "failing", own);
+    const int foreign = AddMount(home_ / "foreign", "somebody else's");
+    const int copied = AddMount(home_ / "copied", own);
+    maintenance::MountLock recorder_of_a_copy;
+    EXPECT_TRUE(recorder_of_a_copy.Hold(home_ / "copied"));
+    const int good = AddMount(home_ / "good", own);
+    store::Events events(store_);
+    for (const int mount : {failing, foreign, copied, good}) {  // what a crash left: its file is missing
+        store::Event open;
+        open.id = events.NextId();
+        open.camera_id = 1;
+        open.mount_id = mount;
+        open.recording = true;
+        open.path = "1/1970-01-01/000000-" + std::to_string(open.id) + ".mkv";
+        events.Begin(open);
+    }
+    // A name that no disk knows: an error that does not mean that the folder is absent.
+    SetPath(failing, home_ / std::string(300, 'x'));
+    const fs::path bare = home_ / "bare";
+    fs::create_directory(bare);
+    store::Mount unplugged;
+    unplugged.name = "unplugged";
+    unplugged.path = bare;
+    unplugged.id = store::Mounts(store_).Add(unplugged);
+
+    RecordingSupervisor supervisor(installation_, std::chrono::seconds(1));
+    CatalogContents catalog;
+    catalog.mounts = {{failing, true}, {foreign, true}, {copied, true}, {good, true}, {unplugged.id, true}};
+    const auto states = [&] {
+        supervisor.Reconcile(catalog);
+        supervisor.DoEverySecond();
+        std::string text;
+        for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation_)) {
+            text += std::string(NameOf(status.state)) + " ";
+        }
+        return text;
+    };
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] {
-        return maintenance::MountFolder::Open(home / "disk", id).has_value();
-    })) << "it was not given its marker";
+        return states().find("failing not-mounted in-use ready") != std::string::npos && events.Open().size() == 3;
+    })) << states();
+    EXPECT_EQ(events.Open().front().mount_id, failing);
+    EXPECT_TRUE(fs::is_empty(bare)) << "a mount point without its disk is never marked";
+    SetPath(failing, home_ / "failing");
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return states(), events.Open().size() == 2; }))
+        << "recovery is tried again";
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
+}
+
+TEST_F(RecordingSupervisorTest, OneRecorderAtATimeHoldsAStore) {
+    std::int64_t now_us = 0;
+    RecorderRole first("A", [&] { return now_us; });
+    RecorderRole second("B", [&] { return now_us; });
+    for (; now_us < 10 * RecorderRole::kExpiryUs; now_us += RecorderRole::kRenewUs) {
+        EXPECT_TRUE(first.Hold(store_, 1));
+        EXPECT_FALSE(second.Hold(store_, 1));
+    }
+    EXPECT_TRUE(RecorderRole("A", [&] { return now_us; }).Hold(store_, 7)) << "started again";
+    EXPECT_EQ(store::RecorderLease(store_).Current().first_own_id, 7);
+    now_us += RecorderRole::kRenewUs;
+    EXPECT_FALSE(first.Hold(store_, 1));
+    EXPECT_FALSE(second.Hold(store_, 1));
+    now_us += RecorderRole::kExpiryUs;
+    EXPECT_TRUE(second.Hold(store_, 1)) << "nobody renews it";
 }
 
 }  // namespace

@@ -18,6 +18,7 @@
 #include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/events.h"
@@ -48,7 +49,12 @@ class RecordingTest : public RecorderTest, public testing::WithParamInterface<st
         mount.name = "disk";
         mount.path = Folder();
         store::Store store = Store();
-        store::Mounts(store).Add(mount);
+        Mark(store::Mounts(store).Add(mount));
+    }
+
+    void Mark(int mount) const {
+        store::Store store = Store();
+        maintenance::MountFolder::WriteMarker(Folder(), maintenance::MarkOf(store, mount));
     }
 
     ~RecordingTest() override { ::umount2(Folder().c_str(), MNT_DETACH); }  // where there is a small disk
@@ -193,6 +199,7 @@ TEST_P(RecordingTest, AFullDiskPausesRecordingAloneUntilThereIsRoom) {
     if (!MountSmallDisk(Folder(), "12m")) {
         GTEST_SKIP() << "this needs the right to mount a tmpfs";
     }
+    Mark(1);
     const int camera = AddCamera("test:mjpeg?size=1280x720&fps=25");
     SetPlan(camera, store::RecordMode::kAlways);
     const Child recorder = StartRecorder();

@@ -2,6 +2,7 @@
 //
 // Events and marks: what is asked of the store is what a look at every single one would give.
 #include <algorithm>
+#include <array>
 #include <random>
 
 #include "standalone/store/events.h"
@@ -137,9 +138,8 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         std::ranges::stable_sort(rows, {}, &Event::camera_id);
         EXPECT_EQ(visited, rows) << mount;
         std::erase_if(rows, [](const Event& event) { return event.recording || event.archived; });
-        const std::vector<Event> oldest = events_.Oldest(mount, 1000);
-        EXPECT_TRUE(std::ranges::is_sorted(oldest, {}, &Event::start_s));
-        EXPECT_THAT(oldest, testing::UnorderedElementsAreArray(rows)) << mount;
+        std::ranges::sort(rows, {}, &Event::id);
+        EXPECT_EQ(events_.Oldest(mount, 0, 1000), rows) << mount;
     }
     const auto demo = std::ranges::count_if(all, &Event::demo);
     EXPECT_EQ(events_.RemoveDemo(), demo);
@@ -155,7 +155,9 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     events_.Begin(event);
     EXPECT_THROW(events_.Begin(event), AlreadyExists);
     EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
-    EXPECT_THAT(events_.Oldest(event.mount_id, 1), IsEmpty()) << "retention leaves an open one alone";
+    EXPECT_THAT(events_.Oldest(event.mount_id, 0, 1), IsEmpty()) << "retention leaves an open one alone";
+    events_.BeginRemoval(std::array{event.id});
+    EXPECT_THAT(events_.InRemoval(event.mount_id), IsEmpty());
     EXPECT_TRUE(events_.Grow(event.id, event.start_s + 1, 25, 5'000'000'000));
     store_.connection().Read([&](soci::session& sql) {
         const bool sqlite = GetParam() == Engine::kSqlite;
@@ -169,9 +171,16 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THROW(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds + 1, 25, 1), InvalidRecord);
     EXPECT_TRUE(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds, 50, 6));
     EXPECT_THAT(events_.Open(), IsEmpty());
-    EXPECT_THAT(Ids(events_.Oldest(event.mount_id, 1)), ElementsAre(event.id));
+    EXPECT_THAT(Ids(events_.Oldest(event.mount_id, 0, 1)), ElementsAre(event.id));
+    EXPECT_THAT(events_.Oldest(event.mount_id, event.id, 1), IsEmpty());
+    const Event finished = *events_.Find(event.id);
+    events_.BeginRemoval(std::array{event.id});
+    EXPECT_FALSE(events_.Find(event.id) || events_.Content(event.mount_id).events > 0);
+    EXPECT_THAT(events_.InRemoval(event.mount_id), ElementsAre(finished));
+    events_.CancelRemoval(std::array{event.id});
+    EXPECT_EQ(events_.Find(event.id), finished);
     EXPECT_TRUE(events_.SetArchived(event.id, true));
-    EXPECT_THAT(events_.Oldest(event.mount_id, 1), IsEmpty());
+    EXPECT_THAT(events_.Oldest(event.mount_id, 0, 1), IsEmpty());
     const int unknown = events_.NextId();
     EXPECT_GT(unknown, event.id);
     EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1) ||
@@ -204,14 +213,15 @@ TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
     EXPECT_FALSE(marks_.Find(MarkKind::kPos, alert.id)) << "an alert is no POS transaction";
     EXPECT_FALSE(events_.Find(alert.id));
     EXPECT_GT(events_.NextId(), pos.id) << "one counter for both";
-    EXPECT_THAT(marks_.EndedBy(camera, kDay, 9), IsEmpty()) << "pending";
+    EXPECT_THAT(marks_.EndedBy(camera, kDay, {}, 9), IsEmpty()) << "pending";
     EXPECT_TRUE(marks_.Save(pos.id, 7, "1/a.span"));
     EXPECT_TRUE(marks_.Miss(alert.id));
     EXPECT_THAT(marks_.Pending(), IsEmpty());
     EXPECT_THAT(Ids(marks_.OnMount(7)), ElementsAre(pos.id));
     EXPECT_EQ(marks_.OnMount(7)[0].path, "1/a.span");
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, 9)), ElementsAre(pos.id));
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, 9)), ElementsAre(pos.id, alert.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, {}, 9)), ElementsAre(pos.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, {}, 9)), ElementsAre(pos.id, alert.id));
+    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, pos, 9)), ElementsAre(alert.id));
     EXPECT_TRUE(marks_.Remove(pos.id));
     EXPECT_FALSE(marks_.Remove(pos.id) || marks_.Save(pos.id, 7, "x") || marks_.Miss(pos.id));
 

@@ -1,0 +1,116 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/mount_maintenance.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/recovery.h"
+#include "standalone/maintenance/retention.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+using maintenance::MountState;
+
+constexpr std::int64_t kRetentionUs = 10'000'000;
+constexpr std::int64_t kMinPauseUs = 5'000'000;
+constexpr std::int64_t kMaxPauseUs = 600'000'000;
+
+}  // namespace
+
+MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context)
+    : mount_id_(mount_id),
+      context_(std::move(context)),
+      status_{mount_id, MountState::kReady, ""},
+      thread_(context_.store_url, "look after mount " + std::to_string(mount_id),
+              [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
+
+void MountMaintenance::Pause::Begin(std::int64_t now_us) {
+    length_us = std::clamp(2 * length_us, kMinPauseUs, kMaxPauseUs);
+    until_us = now_us + length_us;
+}
+
+maintenance::MountStatus MountMaintenance::Status() const {
+    const std::lock_guard lock(mutex_);
+    return status_;
+}
+
+void MountMaintenance::Work(store::Store& store) {
+    const std::int64_t now_us = base::MonotonicMicros();
+    const bool is_clock_trusted = clock_watch_.IsTrusted(now_us, base::WallSeconds());
+    // Without numbers of its own the recorder could not tell its events from those of another one.
+    if (!context_.first_own_id()) {
+        is_recovered_ = false;
+        return;
+    }
+    if (now_us < after_failure_.until_us) {
+        return;
+    }
+    try {
+        const std::optional<store::Mount> mount = store::Mounts(store).Find(mount_id_);
+        if (mount) {
+            Maintain(store, *mount, is_clock_trusted);
+        }
+        after_failure_ = {};
+    } catch (const store::StoreError&) {
+        throw;
+    } catch (const std::exception& failure) {
+        after_failure_.Begin(now_us);
+        SetStatus(MountState::kFailing, failure.what());
+    }
+}
+
+void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, bool is_clock_trusted) {
+    if (!maintenance::OpenMount(store, mount)) {
+        SetStatus(MountState::kNotMounted, mount.path);
+        is_recovered_ = false;  // whatever is mounted later
+        lock_.Release();
+        return;
+    }
+    if (!lock_.Hold(mount.path)) {
+        SetStatus(MountState::kInUse, mount.path);
+        return;
+    }
+    const std::int64_t now_us = base::MonotonicMicros();
+    if (!is_recovered_ && now_us >= after_recovery_.until_us) {
+        after_recovery_.Begin(now_us);
+        is_recovered_ = maintenance::Recover(store, mount, context_.first_own_id().value_or(0), base::WallSeconds());
+    }
+    maintenance::CompleteMarks(store, mount.id, base::WallSeconds(), context_.has_ended);
+    const int space_requests = context_.space_requests;
+    if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
+        next_retention_us_ = now_us + kRetentionUs;
+        const maintenance::RetentionResult deleted = maintenance::EnforceRetention(
+            store, mount, base::WallSeconds(),
+            is_clock_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits);
+        if (deleted.events > 0) {
+            base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
+                          " old events");
+        }
+    }
+    SetStatus(MountState::kReady, "");
+}
+
+void MountMaintenance::SetStatus(MountState state, const std::string& reason) {
+    const std::lock_guard lock(mutex_);
+    const maintenance::MountStatus status{mount_id_, state, reason};
+    if (std::exchange(status_, status) == status) {
+        return;
+    }
+    const std::string name = "mount " + std::to_string(mount_id_);
+    if (state == MountState::kReady) {
+        base::LogInfo(name + " is looked after again");
+    } else {
+        base::LogWarning(name +
+                         (state == MountState::kFailing ? " fails: "
+                          : state == MountState::kInUse ? " is used by the recorder of another state folder: "
+                                                        : " is not there: ") +
+                         reason);
+    }
+}
+
+}  // namespace lookhaven::recorder

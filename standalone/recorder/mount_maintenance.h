@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Looks after one mount in a thread of its own: recovery, the footage of marks, retention.
+//
+// Why so        A disk that fails or hangs must not keep the other mounts from being looked after.
+// Thread safety Any thread; nothing here waits for a disk or the store.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <functional>
+#include <mutex>
+#include <optional>
+#include <string>
+
+#include "standalone/maintenance/clock_watch.h"
+#include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/mount_lock.h"
+#include "standalone/maintenance/mount_status.h"
+#include "standalone/recorder/store_thread.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::recorder {
+
+// What the maintenance of all mounts shares. Borrowed: everything in it outlives them.
+struct MaintenanceContext {
+    std::string store_url;
+    std::function<std::optional<int>()> first_own_id;  // as EventRowQueue::FirstOwnId
+    maintenance::FootageEnds has_ended;
+    const std::atomic<int>& space_requests;  // grows when a disk is full
+};
+
+class MountMaintenance {
+  public:
+    // Starts the thread. Throws std::system_error when no thread can be started.
+    MountMaintenance(int mount_id, MaintenanceContext context);
+
+    // Call every second: does what is due; does not wait. After a failure it pauses, longer after each.
+    void Ask() { thread_.Ask(); }
+
+    maintenance::MountStatus Status() const;
+    // What an earlier recorder left on the mount is finished.
+    bool IsRecovered() const { return is_recovered_; }
+
+    // As in StoreThread.
+    void RequestStop() { thread_.RequestStop(); }
+    bool HasEnded() const { return thread_.HasEnded(); }
+
+  private:
+    // Doubles with each failure in a row.
+    struct Pause {
+        std::int64_t length_us = 0;
+        std::int64_t until_us = 0;
+
+        void Begin(std::int64_t now_us);
+    };
+
+    void Work(store::Store& store);
+    void Maintain(store::Store& store, const store::Mount& mount, bool is_clock_trusted);
+    void SetStatus(maintenance::MountState state, const std::string& reason);
+
+    const int mount_id_;
+    const MaintenanceContext context_;
+
+    // Only the thread uses these.
+    maintenance::ClockWatch clock_watch_;
+    maintenance::MountLock lock_;
+    Pause after_failure_;
+    Pause after_recovery_;
+    std::int64_t next_retention_us_ = 0;
+    int seen_space_requests_ = 0;
+
+    std::atomic<bool> is_recovered_ = false;
+    mutable std::mutex mutex_;
+    maintenance::MountStatus status_;
+    StoreThread thread_;  // last: it uses the others
+};
+
+}  // namespace lookhaven::recorder
