@@ -42,6 +42,16 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       const x = await page.locator(".map-editor .map-item").evaluate(({ style }) => style.getPropertyValue("--x"));
       expect([await page.inputValue(".map-names"), x]).toEqual(["1", "6"]);
     }
+    const revisions: number[] = [];
+    await page.route(/SaveItems/, (route) => {
+      revisions.push((route.request().postDataJSON() as { revision: number }).revision);
+      return route.fulfill({ json: { success: true, data: { revision: 2 } } });
+    });
+    await page.keyboard.press("Control+s");
+    await page.keyboard.press("Control+s");
+    await page.getByText("The map is saved.").waitFor();
+    expect(revisions, "a second request would be taken for someone else's change").toEqual([1]);
+    await page.keyboard.press("ArrowRight");
     leaves = true;
     await page.evaluate(() => history.back());
     await page.waitForSelector(".events");
