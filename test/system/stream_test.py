@@ -94,6 +94,7 @@ class StreamTest(unittest.TestCase):
             slow.next()
             slow.slow_down(1_000_000)
             watching = stack.enter_context(ThreadPoolExecutor(10)).map(watch, viewers)
+            stack.callback(stop.set)
             began = time.monotonic()
             ages, taken = [], []
             while time.monotonic() - began < seconds:
