@@ -17,11 +17,7 @@ export async function report(step, facts = {}) {
 export async function visit(body) {
   const browser = await chromium.launch({
     executablePath: "/usr/bin/chromium",
-    args: ["--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run"].concat([
-      "--disable-background-networking",
-      "--disable-component-update",
-      "--disable-sync",
-    ]),
+    args: ["--disable-gpu", "--disable-quic"],
   });
   try {
     await lines.next();

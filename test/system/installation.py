@@ -1,7 +1,10 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # A whole installation for one test: started by script/server on free ports, in a state folder of its own.
+import base64
 import contextlib
+import hashlib
+import hmac
 import http.client
 import json
 import os
@@ -17,6 +20,7 @@ import urllib.parse
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 BUILD = pathlib.Path(os.environ.get("LOOKHAVEN_BUILD_FOLDER", ROOT / "build/dev"))
 PASSWORDS = {"admin": "correct horse", "viewer": "battery staple"}
+PLAYER = "VEXO.Lookhaven.Player"
 LIVE = "VEXO.Lookhaven.Player.LiveviewSrc"
 
 
@@ -65,10 +69,31 @@ def program(pid):
 def recorded_events(server, camera, account="admin", **parameters):
     """The camera's recorded events of the last day, those that grow included, as EnumEvent tells them."""
     now = int(time.time())
-    query = {"api": "VEXO.Lookhaven.Player", "version": 1, "method": "EnumEvent", "cameralists": camera,
-             "from": now - 86400, "to": now + 3600, "recording": "true", **parameters}
+    span = {"from": now - 86400, "to": now + 3600, "recording": "true"}
+    query = call(PLAYER, "EnumEvent", cameralists=camera, **{**span, **parameters})
     cameras = server.request(query, account).json["data"]["camera"]
     return [event for entry in cameras for event in entry["event"]]
+
+
+def call(api, method, version=1, **parameters):
+    return {"api": api, "version": version, "method": method, **parameters}
+
+
+def pairing_secret(line):
+    """Of what `server pair` printed."""
+    return json.loads(base64.b64decode(line.strip().split(":", 1)[1]))["secret"]
+
+
+def pairing_token(secret, timestamp):
+    """Proves to a host that its paired host asks at this time."""
+    return hmac.new(bytes.fromhex(secret), f"lookhaven pair 1\n{timestamp}".encode(), hashlib.sha256).hexdigest()
+
+
+def make_certificate(folder, name, days):
+    """Self-signed: certificate.pem and key.pem in the folder."""
+    command = "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -keyout key.pem -out certificate.pem"
+    words = [*command.split(), "-subj", f"/CN={name}", "-days", str(days)]
+    subprocess.run(words, cwd=folder, check=True, capture_output=True)
 
 
 class Answer:
@@ -156,10 +181,10 @@ class Installation:
         """Process ids below the web API host, its watcher included."""
         return descendants(self.part("webapi"))
 
-    def cli(self, *arguments, text="", timeout=60):
+    def cli(self, *arguments, text=""):
         done = subprocess.run(
             [pathlib.Path(self.environment["LOOKHAVEN_BUILD_FOLDER"], "bin/lookhaven"), *arguments],
-            env=self.environment, input=text, capture_output=True, text=True, timeout=timeout,
+            env=self.environment, input=text, capture_output=True, text=True, timeout=60,
         )
         if done.returncode != 0:
             raise AssertionError(f"lookhaven {' '.join(arguments)}: {done.stdout}{done.stderr}")
@@ -177,14 +202,15 @@ class Installation:
 
     # --- the web API
 
-    def request(self, query, account=None, form=None, headers=None, body=None, method=None, timeout=30):
-        """One request over plain HTTP; form makes it a POST. A query of pairs is escaped, a text goes as it is."""
-        connection, response = self.open(query, account, form, headers, body, method, timeout)
+    def request(self, *arguments, **named):
+        """One request; its arguments are those of open()."""
+        connection, response = self.open(*arguments, **named)
         with contextlib.closing(connection):
             return Answer(response, response.read())
 
-    def open(self, query, account=None, form=None, headers=None, body=None, method=None, timeout=30):
-        """The same, but the answer's body is left to the caller, who closes the connection."""
+    def open(self, query, account=None, form=None, headers=None, body=None, method=None):
+        """A request over plain HTTP, whose answer's body is left to the caller, who closes the connection. A query of pairs is
+        escaped, a text goes as it is; a form makes it a POST."""
         if not isinstance(query, str):
             query = urllib.parse.urlencode(query)
         headers = dict(headers or {})
@@ -193,20 +219,18 @@ class Installation:
         if form is not None:
             body = urllib.parse.urlencode(form)
             headers.setdefault("Content-Type", "application/x-www-form-urlencoded")
-        connection = http.client.HTTPConnection("127.0.0.1", self.port, timeout=timeout)
+        connection = http.client.HTTPConnection("127.0.0.1", self.port, timeout=30)
         connection.request(method or ("GET" if body is None else "POST"), f"/webapi?{query}", body, headers)
         return connection, connection.getresponse()
 
     def answers(self):
         """The web API serves who is logged in."""
         with contextlib.suppress(OSError):
-            return self.request({"api": "VEXO.Auth", "version": 1, "method": "Status"}, "admin").status == 200
+            return self.request(call("VEXO.Auth", "Status"), "admin").status == 200
 
     def login(self, account, password=None):
-        answer = self.request(
-            {"api": "VEXO.Auth", "version": 1, "method": "Login"},
-            form={"account": account, "password": password or PASSWORDS[account]},
-        )
+        form = {"account": account, "password": password or PASSWORDS[account]}
+        answer = self.request(call("VEXO.Auth", "Login"), form=form)
         if answer.status != 200:
             raise AssertionError(f"log-in of {account}: {answer.status} {answer.body!r}")
         return re.search(r"\bid=([^;]+)", answer.headers["Set-Cookie"])[1]
@@ -222,13 +246,11 @@ class Installation:
 
     def live(self, camera, account="admin", **parameters):
         """A live stream as a Parts; the caller closes it."""
-        query = {"api": LIVE, "version": 1, "method": "Play", "camera": camera, **parameters}
-        connection, response = self.open(query, account)
-        return Parts(connection, response)
+        return Parts(*self.open(call(LIVE, "Play", camera=camera, **parameters), account))
 
 
 class Parts:
-    """Reads a multipart answer part by part."""
+    """Reads a multipart answer part by part; a context manager that closes the connection."""
 
     def __init__(self, connection, response):
         self.response = response
@@ -245,13 +267,22 @@ class Parts:
         self.response.close()
         self._connection.close()
 
+    def ends(self):
+        """Whether the stream has ended before its next part."""
+        try:
+            self.next()
+        except EOFError:
+            return True
+        return False
+
+    def rest(self):
+        """What is still to come, to the end of the stream."""
+        with contextlib.suppress(EOFError):
+            while True:
+                yield self.next()
+
     def slow_down(self, bytes_per_second):
         self._pace, self._began, self._read = bytes_per_second, time.monotonic(), 0
-
-    def _wait_for_pace(self, count):
-        self._read += count
-        if self._pace:
-            time.sleep(max(0.0, self._read / self._pace - (time.monotonic() - self._began)))
 
     def next(self):
         """Header names in lower case with their values, and the picture; fails when the stream ends."""
@@ -272,5 +303,7 @@ class Parts:
             if not piece:
                 raise EOFError("the stream ended inside a part")
             picture += piece
-            self._wait_for_pace(len(piece))
+            self._read += len(piece)
+            if self._pace:
+                time.sleep(max(0.0, self._read / self._pace - (time.monotonic() - self._began)))
         return head, picture

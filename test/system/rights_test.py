@@ -1,87 +1,86 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # Who gets what of every method of every API. What is denied to somebody is answered as what does not exist.
-import base64
 import contextlib
-import hashlib
-import hmac
 import json
 import re
 import time
 import unittest
-from typing import NamedTuple
 
-from api_test import PLAYER, call
-from installation import LIVE, PASSWORDS, ROOT, Installation, Parts, recorded_events
+from installation import PASSWORDS, ROOT, Installation, Parts, call, pairing_secret, pairing_token, recorded_events
 
-# The callers, a letter of an outcome for each: nobody, one whose session has ended, a viewer, viewers who are denied cameras
-# 1 and 2 (but may mark), the sound of all, e-map 1, door 2; a viewer who may mark, a manager, a paired host.
-CALLERS = ["nobody", "ended", "viewer2", "blind", "deaf", "mapless", "doorless", "marker", "manager", "peer"]
-# Outcomes: D data, S data with sound, O an answer without the object, R a redirect, G an error of a gateway, and:
+# Columns are callers: nobody, one whose session has ended, a viewer; viewers who are denied cameras 1 and 2 (but may mark),
+# the sound of all, e-map 1, door 2; a viewer who may mark, a manager, a paired host.
+#
+# Letters are outcomes: D data, S data with sound, O data that does not tell of what stands behind the colon, R a redirect, or
+# the code of an error:
 LETTERS = {400: "B", 401: "E", 403: "F", 404: "N", 405: "M", 409: "C", 429: "Q", 502: "G", 504: "T"}
-
-
-class Row(NamedTuple):
-    api: str
-    method: str
-    there: str  # outcomes where the object exists …
-    absent: str = ""  # … and where it does not; empty: the method is about no object
-    query: dict = {}
-    form: dict | None = None  # makes it a POST
-    parameter: str = ""  # names the object, which is one of cls.ids
-    target: str = ""
-    shows: object = None  # whether the answer's data tells of the object; of other than JSON always
+# Where a request names an object in {braces}, X/Y is X for one that exists and Y for one that does not; a single letter means
+# that this caller gets the same answer to both, byte for byte.
+TABLE = """
+                                                                      nobody ended viewer2 blind deaf mapless doorless marker manager host
+Auth.Status                                                           E      E     D       D     D    D       D        D      D       E
+Auth.Login                                                            M      M     M       M     M    M       M        M      M       M
+Auth.Logout                                                           M      M     M       M     M    M       M        M      M       M
+Catalog.Groups: camera                                                E      E     D       O     D    D       D        D      D       E
+Catalog.Mounts: camera                                                E      E     D       O     D    D       D        D      D       E
+Catalog.Emaps: map                                                    E      E     D       D     D    O       D        D      D       E
+Emap.States emap={map}: door                                          E      E     D/N     D/N   D/N  N       O/N      D/N    D/N     E
+Emap.States emap={map}: camera                                        E      E     D/N     O/N   D/N  N       D/N      D/N    D/N     E
+Emap.Items emap={map}                                                 E      E     F       F     F    F       F        F      D/N     E
+Emap.Devices                                                          E      E     F       F     F    F       F        F      D       E
+POST Emap.SaveItems emap={map} revision=99 items=[]                   E      E     F       F     F    F       F        F      C/N     E
+POST Emap.Report kind=door id={door} state=open                       E      E     F       F     F    F       F        F      D/N     E
+POST Event.Mark kind=alert camera={camera}                            E      E     F       N     F    F       F        D/N    D/N     E
+Event.List cameralists={camera}: event                                E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Event.Download event={event}                                          E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Pairing.Cameras                                                       E      E     E       E     E    E       E        E      E       D
+Picture.Get camera={camera}                                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+POST Playback.SetRate timestamp=1 rate=2                              E      E     N       N     N    N       N        N      N       E
+Playback.GetPosition timestamp=1                                      E      E     N       N     N    N       N        N      N       E
+POST Playback.Pause timestamp=1 on=true                               E      E     N       N     N    N       N        N      N       E
+POST Playback.CheckOwner timestamp=1                                  E      E     N       N     N    N       N        N      N       E
+POST Playback.Stop timestamp=1                                        E      E     N       N     N    N       N        N      N       E
+Relay.Play server=2 camera={camera}                                   E      E     S/N     N     D/N  S/N     S/N      S/N    S/N     E
+Player.LoadCamera: camera                                             E      E     D       O     D    D       D        D      D       E
+Player.SearchAvaiDate cameralists={camera} start=-1d day_count=2: day E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Player.EnumEvent cameralists={camera} from=-1d to=now: event          E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Player.EnumEvent camGrpId=1 cameralists=1,2 from=-1d to=now: event    E      E     D       O     D    D       D        D      D       E
+Player.PlayMjpegEvent eventid={mjpeg} timestamp=3                     E      E     D/R     R     D/R  D/R     D/R      D/R    D/R     E
+Player.PlayMjpegEventNoFrameId eventid={mjpeg} timestamp=4            E      E     D/R     R     D/R  D/R     D/R      D/R    D/R     E
+Player.LiveviewSrc.Play camera={camera}                               E      E     S/G     G     D/G  S/G     S/G      S/G    S/G     S/E
+Player.LiveviewSrc.Play camera={silent}                               E      E     D/G     G     D/G  D/G     D/G      D/G    D/G     D/E
+Player.LiveviewSrc.Play itemType=1 camera={map}                       E      E     D/G     D/G   D/G  G       D/G      D/G    D/G     D/E
+Player.LiveviewSrc.Play itemType=1 camera={map}: camera               E      E     D/G     O/G   D/G  G       D/G      D/G    D/G     D/E
+"""
+CALLERS = TABLE.split(maxsplit=10)[:10]
+ROWS = [re.fullmatch(r"(POST )?(.*?)(?:: (\w+))? +(\S+(?: +\S+){9})", line).groups() for line in TABLE.splitlines()[2:]]
 
 
 def camera_2(data):
     return any(2 in each["camera"] for each in next(iter(data.values())))
 
 
-def about(camera):
-    return lambda data: any(event["camera_id"] == camera for event in data["event"])
+# Whether an answer's data tells of what stands behind the colon, by method.
+TELLS = {
+    ("Groups", "camera"): camera_2,
+    ("Mounts", "camera"): camera_2,
+    ("Emaps", "map"): lambda data: any(one["id"] == 1 for one in data["emap"]),
+    ("States", "door"): lambda data: any(one["id"] == 2 for one in data["door"]),
+    ("States", "camera"): lambda data: any(one["camera"] == 2 for one in data["io"]),
+    ("List", "event"): lambda data: any(event["camera_id"] == 2 for event in data["event"]),
+    ("LoadCamera", "camera"): lambda data: any(one["id"] == 2 for one in data["camera"]),
+    ("SearchAvaiDate", "day"): lambda data: 1 in data["available_day"],
+    ("EnumEvent", "event"): lambda data: any(one["event"] for one in data["camera"]),
+    ("Play", "camera"): lambda data: any(item.get("pairedCamId") == 2 for item in data["items"]),
+}
 
 
-N = "EENNNNNNNE"
-MANAGERS = "EEFFFFFFDE"
-ROWS = [
-    Row("VEXO.Auth", "Status", "EEDDDDDDDE"),
-    Row("VEXO.Auth", "Login", "MMMMMMMMMM"),
-    Row("VEXO.Auth", "Logout", "MMMMMMMMMM"),
-    Row("VEXO.Catalog", "Groups", "EEDODDDDDE", shows=camera_2),
-    Row("VEXO.Catalog", "Mounts", "EEDODDDDDE", shows=camera_2),
-    Row("VEXO.Catalog", "Emaps", "EEDDDODDDE", shows=lambda data: any(one["id"] == 1 for one in data["emap"])),
-    Row("VEXO.Emap", "States", "EEDDDNODDE", N, {}, None, "emap", "map", lambda data: any(one["id"] == 2 for one in data["door"])),
-    Row("VEXO.Emap", "States", "EEDODNDDDE", N, {}, None, "emap", "map", lambda data: any(one["camera"] == 2 for one in data["io"])),
-    Row("VEXO.Emap", "Items", MANAGERS, "EEFFFFFFNE", {}, None, "emap", "map"),
-    Row("VEXO.Emap", "Devices", MANAGERS),
-    Row("VEXO.Emap", "SaveItems", "EEFFFFFFCE", "EEFFFFFFNE", {}, {"revision": 99, "items": "[]"}, "emap", "map"),
-    Row("VEXO.Emap", "Report", MANAGERS, "EEFFFFFFNE", {}, {"kind": "door", "state": "open"}, "id", "door"),
-    Row("VEXO.Event", "Mark", "EEFNFFFDDE", "EEFNFFFNNE", {}, {"kind": "alert"}, "camera", "camera"),
-    Row("VEXO.Event", "List", "EEDODDDDDE", "EEOOOOOOOE", {}, None, "cameralists", "camera", about(2)),
-    Row("VEXO.Event", "Get", "EEDNDDDDDE", N, {}, None, "event", "event"),
-    Row("VEXO.Event", "Get", "EEDNDDDDDE", N, {"kind": "alert"}, None, "event", "alert"),
-    Row("VEXO.Event", "Download", "EEDNDDDDDE", N, {}, None, "event", "event"),
-    Row("VEXO.Pairing", "Cameras", "EEEEEEEEED"),
-    Row("VEXO.Picture", "Get", "EEDNDDDDDE", N, {}, None, "camera", "camera"),
-    Row("VEXO.Playback", "SetRate", N, form={"timestamp": 1, "rate": 2}),
-    Row("VEXO.Playback", "GetPosition", N, query={"timestamp": 1}),
-    Row("VEXO.Playback", "Pause", N, form={"timestamp": 1, "on": "true"}),
-    Row("VEXO.Playback", "CheckOwner", N, form={"timestamp": 1}),
-    Row("VEXO.Playback", "Stop", N, form={"timestamp": 1}),
-    Row("VEXO.Relay", "Play", "EESNDSSSSE", N, {"server": 2}, None, "camera", "camera"),
-    Row(PLAYER, "LoadCamera", "EEDODDDDDE", shows=lambda data: any(one["id"] == 2 for one in data["camera"])),
-    Row(PLAYER, "SearchAvaiDate", "EEDODDDDDE", "EEOOOOOOOE", {"start": "$FROM", "day_count": 2}, None, "cameralists", "camera",
-        lambda data: 1 in data["available_day"]),
-    Row(PLAYER, "EnumEvent", "EEDODDDDDE", "EEOOOOOOOE", {"from": "$FROM", "to": "$TO"}, None, "cameralists", "camera",
-        lambda data: any(one["event"] for one in data["camera"])),
-    Row(PLAYER, "PlayMjpegEvent", "EEDRDDDDDE", "EERRRRRRRE", {"timestamp": 3}, None, "eventid", "mjpeg"),
-    Row(PLAYER, "PlayMjpegEventNoFrameId", "EEDRDDDDDE", "EERRRRRRRE", {"timestamp": 4}, None, "eventid", "mjpeg"),
-    Row(LIVE, "Play", "EESGDSSSSS", "EEGGGGGGGE", {}, None, "camera", "camera"),
-    Row(LIVE, "Play", "EEDGDDDDDD", "EEGGGGGGGE", {}, None, "camera", "silent"),
-    Row(LIVE, "Play", "EEDDDGDDDD", "EEGGGGGGGE", {"itemType": 1}, None, "camera", "map"),
-    Row(LIVE, "Play", "EEDODGDDDD", "EEGGGGGGGE", {"itemType": 1}, None, "camera", "map",
-        lambda data: any(item.get("pairedCamId") == 2 for item in data["items"])),
-]
+def api_and_method(request):
+    api, _, method = request.split()[0].rpartition(".")
+    return "VEXO." + api.replace("Player", "Lookhaven.Player"), method
 
 
 def methods_of_the_product():
@@ -100,8 +99,8 @@ class RightsTest(unittest.TestCase):
     @classmethod
     def setUpClass(cls):
         server = cls.server = cls.enterClassContext(Installation(LOOKHAVEN_DEMO_FOOTAGE="yes"))
-        line = server.cli("server", "pair", "Peer", "--address", "localhost", "--port", str(server.tls_port))
-        cls.secret = json.loads(base64.b64decode(line.strip().split(":", 1)[1]))["secret"]
+        line = server.cli("server", "pair", "Other", "--address", "localhost", "--port", str(server.tls_port))
+        cls.secret = pairing_secret(line)
         server.cli("server", "add", "Itself", text=line)
         far = {one["id_on_server"]: str(one["id"]) for one in json.loads(server.cli("server", "cameras", "--json"))}
         for name in CALLERS[1:-1]:
@@ -118,53 +117,49 @@ class RightsTest(unittest.TestCase):
         cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "event": recorded_events(server, 2)[0]["id"],
                    "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"]}
 
-    def ask(self, row, caller, value):
+    def ask(self, is_post, request, told, caller, **objects):
         """The outcome's letter, and all of the answer that must not tell a hidden object from an absent one."""
         now = int(time.time())
-        query = {**call(row.api, row.method), **row.query}
-        query = {key: {"$FROM": now - 86400, "$TO": now}.get(word, word) for key, word in query.items()}
-        form = dict(row.form) if row.form is not None else None
-        if row.parameter:
-            (query if form is None else form)[row.parameter] = value
+        words = {"-1d": now - 86400, "now": now}
+        given = dict(word.format(**objects).split("=") for word in request.split()[1:])
+        given = {name: words.get(value, value) for name, value in given.items()}
+        api, method = api_and_method(request)
+        query, form = (call(api, method), given) if is_post else ({**call(api, method), **given}, None)
         headers = {}
-        if caller == "peer":
-            token = hmac.new(bytes.fromhex(self.secret), f"lookhaven pair 1\n{now}".encode(), hashlib.sha256).hexdigest()
+        if caller == "host":
+            token = pairing_token(self.secret, now)
             headers["Cookie"] = f"timestamp={now}; token={token}"
             query |= {"client": "REC_SERVER", "cookie": token}
-        account = None if caller in ("nobody", "peer") else caller
+        account = None if caller in ("nobody", "host") else caller
         connection, response = self.server.open(query, account, form, headers)
         with contextlib.closing(connection):
             kind = response.headers.get_content_type()
             if kind.startswith("multipart/"):
                 codecs = Parts(connection, response).next()[0].get("x-codecs", ";")
                 return "D" if codecs.endswith(";") else "S", None
-            if response.status != 200 or kind != "application/json":
-                body = response.read(1 << 20)
-                letter = "R" if response.status == 302 else LETTERS.get(response.status, "D" if response.status == 200 else "?")
-            else:
-                body = response.read()
+            body = response.read(1 << 20)
+            letter = {200: "D", 302: "R", **LETTERS}.get(response.status, "?")
+            if response.status == 200 and kind == "application/json":
                 answer = json.loads(body)
-                letter = LETTERS.get(answer["error"]["code"], "?") if not answer["success"] else \
-                    "O" if row.shows and not row.shows(answer["data"]) else "D"
+                if not answer["success"]:
+                    letter = LETTERS.get(answer["error"]["code"], "?")
+                elif told and not TELLS[method, told](answer["data"]):
+                    letter = "O"
             kept = {name: text for name, text in response.headers.items() if name != "Date"}
             return letter, (response.status, kept, re.sub(rb'"search_time":\d+', b"", body))
 
     def test_each_caller_gets_what_he_may_and_hidden_is_absent(self):
-        for row in ROWS:
-            there = [self.ask(row, caller, self.ids[row.target] if row.target else None) for caller in CALLERS]
-            with self.subTest(row=f"{row.api}.{row.method}", **row.query):
-                self.assertEqual("".join(letter for letter, _ in there), row.there)
-            if not row.absent:
-                continue
-            absent = [self.ask(row, caller, 999_999) for caller in CALLERS]
-            with self.subTest(row=f"{row.api}.{row.method}, absent", **row.query):
-                self.assertEqual("".join(letter for letter, _ in absent), row.absent)
-                for caller, one, other in zip(CALLERS, there, absent):
-                    if one[0] == other[0]:
-                        self.assertEqual(one[1], other[1], caller)
+        for is_post, request, told, cells in ROWS:
+            for caller, cell in zip(CALLERS, cells.split(), strict=True):
+                with self.subTest(request, caller=caller):
+                    there = self.ask(is_post, request, told, caller, **self.ids)
+                    absent = self.ask(is_post, request, told, caller, **dict.fromkeys(self.ids, 999_999)) if "{" in request else there
+                    self.assertEqual(there[0] if there[0] == absent[0] else f"{there[0]}/{absent[0]}", cell)
+                    if there[0] == absent[0]:
+                        self.assertEqual(there[1], absent[1])
 
     def test_each_method_has_a_row(self):
-        self.assertEqual({(row.api, row.method) for row in ROWS}, methods_of_the_product())
+        self.assertEqual({api_and_method(request) for _, request, *_ in ROWS}, methods_of_the_product())
 
 
 if __name__ == "__main__":

@@ -12,13 +12,16 @@ import tempfile
 import time
 import unittest
 
-from installation import ROOT, Installation, free_port, wait_until
+from installation import ROOT, Installation, free_port, make_certificate, wait_until
+
+
+def said_by(*command, **options):
+    return subprocess.run(command, capture_output=True, check=True, **options).stdout.decode(errors="replace")
 
 
 def fetched(server, path):
     """Head and body of a file of the web server."""
-    address = f"http://127.0.0.1:{server.port}/{path}"
-    return subprocess.run(["curl", "-si", address], capture_output=True, check=True).stdout.decode(errors="replace")
+    return said_by("curl", "-si", f"http://127.0.0.1:{server.port}/{path}")
 
 
 class ServerTest(unittest.TestCase):
@@ -130,8 +133,7 @@ class ServerTest(unittest.TestCase):
 
     def test_https_on_every_address_and_http_on_loopback_only(self):
         with Installation() as server:
-            listening = subprocess.run(["ss", "-Hltn"], capture_output=True, text=True, check=True).stdout
-            local = {line.split()[3] for line in listening.splitlines()}
+            local = {line.split()[3] for line in said_by("ss", "-Hltn").splitlines()}
             self.assertIn(f"127.0.0.1:{server.port}", local)
             self.assertNotIn(f"0.0.0.0:{server.port}", local)
             self.assertIn(f"0.0.0.0:{server.tls_port}", local)
@@ -145,11 +147,9 @@ class ServerTest(unittest.TestCase):
         with Installation() as server:
             folder = server.home / "tls"
             made = (folder / "certificate.pem").read_bytes()
-            text = subprocess.run(["openssl", "x509", "-noout", "-text"], input=made, capture_output=True, check=True).stdout
-            self.assertIn(b"CA:FALSE", text)
+            self.assertIn("CA:FALSE", said_by("openssl", "x509", "-noout", "-text", input=made))
             server.stop()
-            command = "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -subj /CN=owner -days 1"
-            subprocess.run([*command.split(), "-keyout", "key.pem", "-out", "certificate.pem"], cwd=folder, check=True)
+            make_certificate(folder, "owner", 1)
             owners = [(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")]
             server.start()
             self.assertIn("expires within 30 days", server.said())
@@ -161,6 +161,7 @@ class ServerTest(unittest.TestCase):
             self.assertIn("Content-Security-Policy: default-src 'self'", page)
             self.assertNotIn("unsafe", page)
             self.assertIn("Cache-Control: no-cache", page)
+            self.assertIn(f'<meta name="tls-port" content="{server.tls_port}"', page, "the client leads to https")
             asset = page.split('src="./')[1].split('"')[0]
             warning = "webman/3rdparty/Lookhaven/resources/images/2x/components/icon_indicator_warning.png"
             for path, kind, caching in ((asset, "application/javascript", "immutable"), (warning, "image/png", "no-cache")):

@@ -35,14 +35,7 @@ export function kindOf({ kind, reason }: Pick<Footage, "kind" | "reason">): Even
   return reason === kReasonContinuous ? "continuous" : "alarm";
 }
 
-/** Index of the first footage, in order of start, that ends after the time. */
-export function firstEndingAfter(footage: readonly Footage[], timeS: number): number {
-  // Starts ascend and spans of one camera hardly overlap, so ends ascend as well.
-  let [low, high] = [0, footage.length];
-  while (low < high) {
-    const middle = (low + high) >> 1;
-    if (footage[middle]!.stop > timeS) high = middle;
-    else low = middle + 1;
-  }
-  return low;
+/** What touches the span. Marks lie within recordings, so that ends do not ascend with starts. */
+export function touching(footage: readonly Footage[], fromS: number, toS: number): Footage[] {
+  return footage.filter(({ start, stop }) => start < toS && stop > fromS);
 }

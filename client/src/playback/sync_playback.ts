@@ -7,7 +7,6 @@
 //               others join as soon as they have something at the playhead, and are realigned when they drift apart.
 
 import type { Footage, Recordings } from "../wire/recordings";
-import { firstEndingAfter } from "./coverage";
 import type { FootageCache } from "./footage_cache";
 import { Player } from "./player";
 
@@ -237,8 +236,8 @@ export class SyncPlayback {
     await this.#cache.load(cameras, fromS - 1, fromS + kLookAheadS, true);
     const candidates = cameras.flatMap((camera) => {
       const events = this.#events(camera, fromS - 1, fromS + kLookAheadS);
-      const after = (one: Footage) => one.id !== current?.id && one.start >= (current ? current.start : fromS);
-      return events.slice(firstEndingAfter(events, fromS)).find(after) ?? [];
+      const isNext = ({ id, start, stop }: Footage) => id !== current?.id && stop > fromS && start >= (current?.start ?? fromS);
+      return events.find(isNext) ?? [];
     });
     const followsAtOnce = candidates.find(({ camera, start }) => camera === current?.camera && start <= fromS + kMaxGapS);
     return followsAtOnce ?? candidates.sort((one, other) => one.start - other.start)[0] ?? null;

@@ -32,13 +32,7 @@ test.each<[string, pushed: number[], heardMs: number | null, shown: number | nul
   ["the newest when nothing is heard", [0, 40, 80], null, 80, [0, 40]],
   ["a late one too, if it is the newest", [0], 500, 0, []],
   ["one of another time than the sound at once", [5000], 0, 5000, []],
-  [
-    "one too early rather than none: the decoder has no more to lend",
-    Array.from({ length: 18 }, (_, n) => 100 + n),
-    0,
-    101,
-    [100],
-  ],
+  ["one too early rather than none: the decoder has no more to lend", Array.from({ length: 18 }, (_, n) => 100 + n), 0, 101, [100]],
 ])("picture to show: %s", (_name, pushed, heardMs, shown, closed) => {
   const gone: number[] = [];
   const queue = new FrameQueue(() => undefined);

@@ -22,21 +22,11 @@ test("pictures that come while one is being decoded give way to the newest; a ba
   expect(shown).toEqual([1, 4, 5]);
 });
 
-/** A server on which the listed profiles give one picture and end; the others fail with `status`. */
-function serverWith(working: (number | null)[], status: number) {
-  const asked: (number | null)[] = [];
-  const server = {
-    async live(_camera: number, profile: number | null) {
-      asked.push(profile);
-      if (!working.includes(profile)) throw new ServerError(status, 0, "refused");
-      const body = "--b\r\nContent-Length: 1\r\n\r\nx\r\n";
-      return new Response(body, { headers: { "Content-Type": "multipart/x-mixed-replace; boundary=b" } });
-    },
-  };
-  return { asked, server: server as unknown as Server };
-}
+const multipart = (body: BodyInit) => new Response(body, { headers: { "Content-Type": "multipart/x-mixed-replace; boundary=b" } });
+const never = () => new AbortController().signal;
+const stillsThat = (run: LiveSource["run"]): LiveSource => ({ pollIntervalMs: 2000, lostAfterMs: 10_000, run });
 
-test.each([
+test.each<[string, (number | null)[], number, (number | null)[]]>([
   ["the small picture where there is one", [1, null], 504, [1, 1]],
   ["else the usual one, and at once the next time", [null], 504, [1, null, null]],
   ["both fail: the small one first again", [], 504, [1, null, 1, null]],
@@ -46,22 +36,23 @@ test.each([
 ])("profiles of a small tile, run twice: %s", async (_name, working, status, asked) => {
   vi.stubGlobal("createImageBitmap", async () => ({ close: () => undefined }));
   vi.stubGlobal("cancelAnimationFrame", () => undefined);
-  const fake = serverWith(working, status);
-  const stills = { pollIntervalMs: 0, lostAfterMs: 0, run: async () => undefined };
-  const source = new StreamSource(fake.server, { id: 1, video_type: 1 } as Camera, true, stills);
+  const live = vi.fn(async (_camera: Camera, profile: number | null) => {
+    if (!working.includes(profile)) throw new ServerError(status, 0, "refused");
+    return multipart("--b\r\nContent-Length: 1\r\n\r\nx\r\n");
+  });
+  const server = { live } as unknown as Server;
+  const source = new StreamSource(server, { id: 1, video_type: 1 } as Camera, true, stillsThat(async () => undefined));
   for (let run = 0; run < 2; run += 1) {
-    const failed = await source
-      .run(() => undefined, new AbortController().signal)
-      .then(() => false, () => true);
-    expect(failed).toBe(working.length === 0);
+    const [{ status: outcome }] = await Promise.allSettled([source.run(() => undefined, never())]);
+    expect(outcome).toBe(working.length === 0 ? "rejected" : "fulfilled");
   }
-  expect(fake.asked).toEqual(asked);
+  expect(live.mock.calls.map(([, profile]) => profile)).toEqual(asked);
 });
 
 describe("a stream that cannot be played", () => {
   const camera = { id: 2, name: "Parking", video_type: 3 } as Camera;
-  const key = `Content-Type: image/H264\r\nX-Timestamp: 40000\r\nContent-Length: 13\r\n\r\n`;
-  const picture = Buffer.from(bytes("000001 674d401f 000001 6588")).toString("latin1");
+  const keyFrame = (profile = "4d401f") => bytes(`000001 67${profile} 000001 6588`);
+  const part = Buffer.concat([Buffer.from("--b\r\nContent-Type: image/H264\r\nX-Timestamp: 40000\r\nContent-Length: 13\r\n\r\n"), keyFrame(), Buffer.from("\r\n")]);
   /** What each decoder does with its first picture. */
   let fails: boolean[] = [];
   let isSupported = true;
@@ -77,50 +68,39 @@ describe("a stream that cannot be played", () => {
     get decodeQueueSize(): number {
       return Decoder.decodeQueueSize;
     }
-    configure({ codec }: { codec: string }): void {
-      told.push(codec);
-    }
-    reset(): void {
-      told.push("reset");
-    }
+    configure = ({ codec }: { codec: string }) => told.push(codec);
+    reset = () => told.push("reset");
+    close = () => (this.state = "closed");
     decode({ timestamp }: { timestamp: number }): void {
       told.push(timestamp / 1000);
       if (Decoder.isMute) return;
       if (fails.shift()) queueMicrotask(() => this.how.error(new DOMException("damaged", "EncodingError")));
       else queueMicrotask(() => this.how.output({ timestamp, close: () => undefined }));
     }
-    close(): void {
-      this.state = "closed";
-    }
     static isConfigSupported = async () => ({ supported: isSupported });
   }
 
   /** Gives three key frames, one after the other, and ends. */
   const server = {
-    async live() {
-      const body = new ReadableStream({
-        async start(controller) {
-          for (let part = 0; part < 3; part += 1) {
-            controller.enqueue(Buffer.from(`--b\r\n${key}${picture}\r\n`, "latin1"));
-            await new Promise((resolve) => setTimeout(resolve));
-          }
-          controller.close();
-        },
-      });
-      return new Response(body, { headers: { "Content-Type": "multipart/x-mixed-replace; boundary=b" } });
-    },
+    live: async () =>
+      multipart(
+        new ReadableStream({
+          async start(controller) {
+            for (let sent = 0; sent < 3; sent += 1) {
+              controller.enqueue(part);
+              await new Promise((resolve) => setTimeout(resolve));
+            }
+            controller.close();
+          },
+        }),
+      ),
   } as unknown as Server;
 
   beforeEach(() => {
     vi.stubGlobal("VideoDecoder", Decoder);
-    vi.stubGlobal(
-      "EncodedVideoChunk",
-      class {
-        constructor(given: object) {
-          Object.assign(this, given);
-        }
-      },
-    );
+    vi.stubGlobal("EncodedVideoChunk", function (this: object, given: object) {
+      Object.assign(this, given);
+    });
     vi.stubGlobal("requestAnimationFrame", () => 0);
     vi.stubGlobal("cancelAnimationFrame", () => undefined);
   });
@@ -132,10 +112,10 @@ describe("a stream that cannot be played", () => {
     ["an unknown codec at once", [true], false, 0, "This browser cannot play this kind of H.264"],
   ])("%s", async (_name, failures, supported, shown, reason) => {
     [fails, isSupported] = [[...failures], supported];
-    const stills: LiveSource = { pollIntervalMs: 2000, lostAfterMs: 10_000, run: vi.fn(async () => undefined) };
+    const stills = stillsThat(vi.fn(async () => undefined));
     const source = new StreamSource(server, camera, false, stills);
     let frames = 0;
-    for (let run = 0; run < 2; run += 1) await source.run(() => (frames += 1), new AbortController().signal);
+    for (let run = 0; run < 2; run += 1) await source.run(() => (frames += 1), never());
     expect(source.unplayable?.reason ?? null).toBe(reason);
     expect(frames).toBe(reason ? shown : shown + 3);
     expect(stills.run).toHaveBeenCalledTimes(reason ? 1 : 0);
@@ -144,20 +124,14 @@ describe("a stream that cannot be played", () => {
 
   test("goes back to the stream after a while", async () => {
     [fails, isSupported] = [[true, true, true], true];
-    const stills = new (class implements LiveSource {
-      pollIntervalMs = 2000;
-      lostAfterMs = 10_000;
-      run = (_show: unknown, signal: AbortSignal) =>
-        new Promise<void>((resolve) => signal.addEventListener("abort", () => resolve()));
-    })();
-    const source = new StreamSource(server, camera, false, stills);
-    const signal = new AbortController().signal;
+    const untilLeft = stillsThat((_show, signal) => new Promise((resolve) => signal.addEventListener("abort", () => resolve())));
+    const source = new StreamSource(server, camera, false, untilLeft);
     vi.useFakeTimers({ toFake: ["performance", "setTimeout", "clearTimeout"] });
-    const streaming = source.run(() => undefined, signal);
+    const streaming = source.run(() => undefined, never());
     await vi.advanceTimersByTimeAsync(100);
     await streaming;
     expect(source.unplayable).not.toBe(null);
-    const polling = source.run(() => undefined, signal);
+    const polling = source.run(() => undefined, never());
     await vi.advanceTimersByTimeAsync(60_001);
     await polling;
     expect(source.unplayable).toBe(null);
@@ -168,25 +142,24 @@ describe("a stream that cannot be played", () => {
     told.length = 0;
     fails = [];
     const player = new VideoPlayer(vi.fn(), vi.fn(), null);
-    const keyFrame = (profile: string) => bytes(`000001 67${profile} 000001 6588`);
     const slice = bytes("000001 419a");
     const give = (ms: number, data: Uint8Array, queued: number) => {
       Decoder.decodeQueueSize = queued;
       player.take("H264", ms * 1000, data, { capturedMs: ms, ageMs: 0 });
     };
     give(0, slice, 0);
-    give(40, keyFrame("4d401f"), 0);
+    give(40, keyFrame(), 0);
     give(60, slice, kMaxQueuedFrames);
     expect(told, "a short backlog is no reason to leave anything out").toEqual(["avc1.4d401f", 40, 60]);
     give(80, slice, kMaxQueuedFrames + 1);
-    give(100, keyFrame("4d401f"), 0);
+    give(100, keyFrame(), 0);
     expect(told.splice(0), "behind, but caught up by the key frame").toEqual(["avc1.4d401f", 40, 60, 100]);
     give(120, slice, kMaxQueuedFrames + 1);
     give(140, slice, 3);
-    give(160, keyFrame("4d401f"), 2);
+    give(160, keyFrame(), 2);
     give(200, slice, 1);
     expect(told.splice(0)).toEqual(["reset", "avc1.4d401f", 160, 200]);
-    give(220, keyFrame("4d401f"), kMaxQueuedFrames + 1);
+    give(220, keyFrame(), kMaxQueuedFrames + 1);
     give(240, keyFrame("64001f"), 1);
     expect(told, "behind at the key frame itself").toEqual(["reset", "avc1.4d401f", 220, "avc1.64001f", 240]);
     Decoder.decodeQueueSize = 0;
@@ -197,8 +170,7 @@ describe("a stream that cannot be played", () => {
     Decoder.isMute = true;
     const giveUp = vi.fn();
     const player = new VideoPlayer(vi.fn(), giveUp, null);
-    const keyFrame = bytes("000001 674d401f 000001 6588");
-    for (let ms = 0; ms < 600; ms += 1) player.take("H264", ms * 1000, keyFrame, { capturedMs: ms, ageMs: 0 });
+    for (let ms = 0; ms < 600; ms += 1) player.take("H264", ms * 1000, keyFrame(), { capturedMs: ms, ageMs: 0 });
     expect(giveUp).toHaveBeenCalledTimes(1);
     Decoder.isMute = false;
   });
@@ -206,9 +178,9 @@ describe("a stream that cannot be played", () => {
   test("without a decoder no stream is opened at all", async () => {
     vi.stubGlobal("VideoDecoder", undefined);
     vi.stubGlobal("isSecureContext", true);
-    const stills: LiveSource = { pollIntervalMs: 2000, lostAfterMs: 10_000, run: vi.fn(async () => undefined) };
+    const stills = stillsThat(vi.fn(async () => undefined));
     const source = new StreamSource({} as Server, camera, false, stills);
-    await source.run(() => undefined, new AbortController().signal);
+    await source.run(() => undefined, never());
     expect(stills.run).toHaveBeenCalledTimes(1);
   });
 });

@@ -2,8 +2,8 @@
 //
 // Segments out of the recording log's run lengths.
 
-import { segmentsOf } from "../../../client/src/playback/coverage";
-import type { Runs } from "../../../client/src/wire/recordings";
+import { segmentsOf, touching } from "../../../client/src/playback/coverage";
+import type { Footage, Runs } from "../../../client/src/wire/recordings";
 
 test.each<[string, Runs, [number, number, boolean][]]>([
   ["holes are left out", [[0, 2], [1, 3], [0, 1], [2, 1]], [[110, 125, false], [130, 135, true]]],
@@ -12,4 +12,9 @@ test.each<[string, Runs, [number, number, boolean][]]>([
   ["a damaged count moves nothing backwards", [[1, -3], [1, 1]], [[100, 105, false]]],
 ])("segments: %s", (_name, runs, segments) => {
   expect(segmentsOf(100, 200, 5, runs).map(({ startS, stopS, isEvent }) => [startS, stopS, isEvent])).toEqual(segments);
+});
+
+test("a recording is on the screen however many marks within it have ended before", () => {
+  const footage = [[0, 100], ...Array.from({ length: 20 }, (_, at) => [10 + at, 11 + at])].map(([start, stop]) => ({ start, stop }) as Footage);
+  expect(touching(footage, 50, 60)).toEqual([footage[0]]);
 });

@@ -2,6 +2,8 @@
 //
 // Recordings that a test makes up, played as the server plays them; answers requests of fetch, or of a web server.
 
+import { setTimeout } from "node:timers/promises";
+
 export interface Recorded {
   id: number;
   camera: number;
@@ -116,45 +118,31 @@ export class FakeArchive {
   }
 
   #stream(found: Recorded, from: number, stop: number, key: number, rate: number, isSampled: boolean, signal?: AbortSignal) {
-    let timer: ReturnType<typeof setTimeout>;
-    const body = new ReadableStream<Uint8Array>({
-      start: (controller) => {
-        let index = from;
-        const end = () => {
-          clearTimeout(timer);
-          if (this.streams.includes(stream)) this.streams.splice(this.streams.indexOf(stream), 1);
-          signal?.removeEventListener("abort", leave);
-        };
-        const leave = () => {
-          end();
-          controller.error(new DOMException("left", "AbortError"));
-        };
-        const close = () => {
-          end();
-          controller.close();
-        };
-        const stream: Stream = { key, rate, preempt: close };
-        const send = () => {
-          // A browser that does not read holds the server back.
-          if ((controller.desiredSize ?? 0) > -20) {
-            controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
-            controller.enqueue(part("image/jpeg", this.picture));
-            index = Math.min(stop, index + Math.max(1, isSampled ? 1 : stream.rate));
-          }
-          timer = setTimeout(advance, (1000 / this.framesPerSecond) * Math.max(1, -stream.rate));
-        };
+    const ended = new AbortController();
+    const stream: Stream = { key, rate, preempt: () => ended.abort() };
+    const wait = (ms: number) => setTimeout(ms, undefined, { signal: ended.signal }).catch(() => undefined);
+    // A newer player of the session takes the place of the oldest.
+    if (this.streams.length >= this.playersPerSession) this.streams[0]!.preempt();
+    this.streams.push(stream);
+    ended.signal.addEventListener("abort", () => this.streams.splice(this.streams.indexOf(stream), 1));
+    signal?.addEventListener("abort", () => ended.abort());
+    const send = async (controller: ReadableStreamDefaultController<Uint8Array>) => {
+      for (let index = from; !ended.signal.aborted; ) {
+        // A browser that does not read holds the server back.
+        if ((controller.desiredSize ?? 0) > -20) {
+          controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
+          controller.enqueue(part("image/jpeg", this.picture));
+          index = Math.min(stop, index + Math.max(1, isSampled ? 1 : stream.rate));
+        }
+        await wait((1000 / this.framesPerSecond) * Math.max(1, -stream.rate));
         // At the end of what is still being recorded the server waits a while, and then ends the stream.
-        const advance = () => {
-          if (index < found.frames) send();
-          else timer = setTimeout(() => (index < found.frames ? send() : close()), kTailMs);
-        };
-        // A newer player of the session takes the place of the oldest.
-        if (this.streams.length >= this.playersPerSession) this.streams[0]!.preempt();
-        this.streams.push(stream);
-        signal?.addEventListener("abort", leave);
-        send();
-      },
-    });
+        if (index >= found.frames) await wait(kTailMs);
+        if (index >= found.frames) ended.abort();
+      }
+      if (signal?.aborted) controller.error(new DOMException("left", "AbortError"));
+      else controller.close();
+    };
+    const body = new ReadableStream<Uint8Array>({ start: (controller) => void send(controller) });
     return new Response(body, { headers: { "Content-Type": `multipart/x-mixed-replace; boundary=${kBoundary}` } });
   }
 }

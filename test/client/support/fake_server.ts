@@ -9,6 +9,7 @@ import type { AddressInfo } from "node:net";
 import { tmpdir } from "node:os";
 import { extname, join } from "node:path";
 import { Readable } from "node:stream";
+import { pipeline } from "node:stream/promises";
 import { FakeArchive } from "./fake_archive";
 
 const kPolicy =
@@ -31,7 +32,7 @@ export class FakeServer {
   polls = 0;
   mostPollsAtOnce = 0;
   hasSession = false;
-  jpeg = Buffer.alloc(0);
+  jpeg: Buffer = Buffer.alloc(0);
   /** What cameras of another video type send, 25 pictures a second, over and over, with a tone beside each `isLoud`. */
   readonly muxed = new Map<number, { type: string; pictures: Buffer[]; isLoud(picture: number): boolean }>();
   readonly archive = new FakeArchive();
@@ -68,13 +69,8 @@ export class FakeServer {
     }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
     const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
-    json(answer, 200, {
-      success: true,
-      data:
-        method === "LoadCamera"
-          ? list
-          : { account: "admin", user_id: 1, is_manager: true, players_per_session: this.archive.playersPerSession },
-    });
+    const account = { account: "admin", user_id: 1, is_manager: true, players_per_session: this.archive.playersPerSession };
+    json(answer, 200, { success: true, data: method === "LoadCamera" ? list : account });
   }
 
   async #recordings(query: URLSearchParams, request: IncomingMessage, answer: ServerResponse): Promise<void> {
@@ -86,9 +82,7 @@ export class FakeServer {
     const given = this.archive.answer(query, left.signal) ?? new Response(null, { status: 404 });
     answer.writeHead(given.status, Object.fromEntries(given.headers));
     if (!given.body) return void answer.end();
-    Readable.fromWeb(given.body as never)
-      .on("error", () => answer.destroy())
-      .pipe(answer);
+    await pipeline(Readable.fromWeb(given.body as never), answer).catch(() => answer.destroy());
   }
 
   #file(path: string, answer: ServerResponse): void {
@@ -143,7 +137,5 @@ function part(head: string, body: Buffer): Buffer {
 }
 
 function json(answer: ServerResponse, status: number, body: unknown): void {
-  answer
-    .writeHead(status, { "Content-Type": "application/json", "Cache-Control": "no-store" })
-    .end(JSON.stringify(body));
+  answer.writeHead(status, { "Content-Type": "application/json", "Cache-Control": "no-store" }).end(JSON.stringify(body));
 }

@@ -51,13 +51,8 @@ describe("a map as the server tells it", () => {
     answerWith({ revision: 9 });
     expect(await emaps.save(map)).toBe(9);
     expect(asked[0]?.init?.method).toBe("POST");
-    expect(JSON.parse(String(asked[0]?.init?.body))).toEqual({
-      emap: 1,
-      revision: 8,
-      hideItemName: true,
-      smallItemSize: true,
-      items: [raw],
-    });
+    const saved = { emap: 1, revision: 8, hideItemName: true, smallItemSize: true, items: [raw] };
+    expect(JSON.parse(String(asked[0]?.init?.body))).toEqual(saved);
     answerWith(null, 409);
     await expect(emaps.save(map)).rejects.toMatchObject({ status: 409 });
   });

@@ -37,15 +37,9 @@ std::string MakePicture() {
     return picture;
 }
 
+// On a socket that blocks; false when the client has gone or does not read for seconds.
 bool SendAll(int socket, const std::string& bytes) {
-    for (std::size_t sent = 0; sent < bytes.size();) {
-        const ssize_t step = ::send(socket, bytes.data() + sent, bytes.size() - sent, MSG_NOSIGNAL);
-        if (step <= 0) {
-            return false;
-        }
-        sent += static_cast<std::size_t>(step);
-    }
-    return true;
+    return ::send(socket, bytes.data(), bytes.size(), MSG_NOSIGNAL) == static_cast<ssize_t>(bytes.size());
 }
 
 std::string ReceiveHead(int socket) {

@@ -5,6 +5,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <fstream>
+#include <iterator>
 #include <sstream>
 
 #include <sys/socket.h>
@@ -21,10 +22,6 @@
 namespace lookhaven::host {
 
 namespace {
-
-std::int64_t NowSeconds() {
-    return base::WallSeconds();
-}
 
 sockaddr_un Address(const std::filesystem::path& path) {
     sockaddr_un address{};
@@ -91,7 +88,7 @@ HostUnderTest::~HostUnderTest() {
 
 store::NewSession HostUnderTest::LogIn(const std::string& account) const {
     store::Store records = store::Store::Open(home_->StoreUrl());
-    return store::Sessions(records).Create(store::Users(records).FindByName(account).value().id, NowSeconds());
+    return store::Sessions(records).Create(store::Users(records).FindByName(account).value().id, base::WallSeconds());
 }
 
 base::FileDescriptor HostUnderTest::Connect() const {
@@ -108,17 +105,17 @@ base::FileDescriptor HostUnderTest::Open(const std::string& method, const std::s
 }
 
 base::FileDescriptor HostUnderTest::OpenQuery(const std::string& query, const std::string& cookie) const {
+    return Send(ScgiBytes({{"REQUEST_METHOD", "GET"}, {"QUERY_STRING", query}, {"HTTP_COOKIE", "id=" + cookie}}));
+}
+
+base::FileDescriptor HostUnderTest::Send(const std::string& bytes) const {
     base::FileDescriptor connection = Connect();
-    const std::string bytes =
-        ScgiBytes({{"REQUEST_METHOD", "GET"}, {"QUERY_STRING", query}, {"HTTP_COOKIE", "id=" + cookie}});
     send(connection.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
     return connection;
 }
 
 Answer HostUnderTest::Exchange(const std::string& bytes) const {
-    const base::FileDescriptor connection = Connect();
-    send(connection.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
-    return ReadAnswer(connection);
+    return ReadAnswer(Send(bytes));
 }
 
 Answer HostUnderTest::Ask(const std::string& query, const std::string& cookie, Headers headers,
@@ -162,11 +159,7 @@ Answer HostUnderTest::ReadAnswer(const base::FileDescriptor& connection) {
 std::vector<pid_t> HostUnderTest::Children() const {
     const std::string pid = std::to_string(pid_);
     std::ifstream list("/proc/" + pid + "/task/" + pid + "/children");
-    std::vector<pid_t> children;
-    for (pid_t child = 0; list >> child;) {
-        children.push_back(child);
-    }
-    return children;
+    return {std::istream_iterator<pid_t>(list), {}};
 }
 
 std::size_t HostUnderTest::RequestProcesses() const {

@@ -46,6 +46,7 @@ class HostUnderTest {
     base::FileDescriptor Open(const std::string& method, const std::string& cookie) const;
     // The same for any query.
     base::FileDescriptor OpenQuery(const std::string& query, const std::string& cookie) const;
+    base::FileDescriptor Send(const std::string& bytes) const;
     // Sends bytes, then reads to the end of the answer.
     Answer Exchange(const std::string& bytes) const;
     Answer Ask(const std::string& query, const std::string& cookie, Headers headers = {},

@@ -48,31 +48,21 @@ void Stream(int deaf_pictures) {
     }
 }
 
-Json::Value SetOfSignals(const sigset_t& signals) {
-    Json::Value numbers(Json::arrayValue);
-    for (int number = 1; number < 32; ++number) {
-        if (sigismember(&signals, number) == 1) {
-            numbers.append(number);
-        }
-    }
-    return numbers;
-}
-
 // What a request process finds around itself.
 Json::Value Surroundings() {
     Json::Value found;
+    found["masked"] = found["ignored"] = Json::arrayValue;
     sigset_t mask;
-    sigset_t ignored;
-    sigemptyset(&ignored);
     sigprocmask(SIG_SETMASK, nullptr, &mask);
     for (int number = 1; number < 32; ++number) {
+        if (sigismember(&mask, number) == 1) {
+            found["masked"].append(number);
+        }
         struct sigaction action {};
         if (sigaction(number, nullptr, &action) == 0 && action.sa_handler == SIG_IGN) {
-            sigaddset(&ignored, number);
+            found["ignored"].append(number);
         }
     }
-    found["masked"] = SetOfSignals(mask);
-    found["ignored"] = SetOfSignals(ignored);
     found["nonblocking"] = (fcntl(STDOUT_FILENO, F_GETFL) & O_NONBLOCK) != 0;
     found["log_pid"] = g_DbgLogPid;
     found["highest_descriptor"] = 0;
@@ -96,67 +86,18 @@ Json::Value Caller(const APIRequest& request) {
     return caller;
 }
 
-void Play(APIRequest* request, APIResponse*) {
-    PlayTest(*request);
+void Nothing(APIRequest*, APIResponse*) {}
+
+void Success(APIRequest* request, APIResponse* response) {
+    response->SetSuccess(request->GetParam("", Json::nullValue));
 }
 
-void Serve(APIRequest* request, APIResponse* response) {
-    const std::string method = request->GetAPIMethod();
-    if (method == "Success") {
-        response->SetSuccess(request->GetParam("", Json::nullValue));
-    } else if (method == "Error") {
-        response->SetSuccess(1);
-        response->SetError(401, "param");
-    } else if (method == "Silenced") {
-        response->SetSuccess(1);
-        response->SetEnableOutput(false);
-    } else if (method == "Throw") {
-        throw std::runtime_error("thrown on purpose");
-    } else if (method == "ThrowNumber") {
-        throw 5;
-    } else if (method == "WrongType") {
-        request->GetParam("text", 0).asInt();
-    } else if (method == "Raw") {
-        std::printf("Content-Type: text/plain\r\n\r\nraw");
-        response->SetSuccess("not after raw bytes");
-    } else if (method == "RawThenThrow") {
-        std::printf("Content-Type: text/plain\r\n\r\nhalf");
-        throw std::runtime_error("thrown on purpose");
-    } else if (method == "EmptyStream") {
-        const MultipartResponse nothing;
-    } else if (method == "PeerStream") {
-        if (IsAuthPairMatch(request->GetParam("cookie", "").asString(),
-                            request->GetParam("timestamp", "").asString())) {
-            Stream(-1);
-        }
-    } else if (method == "Stream") {
-        Stream(0);
-    } else if (method == "LateStream" || method == "DeafStream") {
-        signal(SIGTERM, SIG_IGN);
-        Stream(method == "LateStream" ? 30 : -1);
-    } else if (method == "Hang") {
-        for (;;) {
-            pause();
-        }
-    } else if (method == "Devour") {
-        if (request->GetParam("stream", false).asBool()) {
-            const MultipartResponse nothing;
-        }
-        std::vector<char> much;
-        much.reserve(std::size_t{300} << 20);
-        response->SetSuccess(much.emplace_back());
-    } else if (method == "Search") {
-        std::list<Event> events;
-        EventFilterParam everything;
-        EventListGetAll(events, everything);
-        response->SetSuccess(static_cast<Json::UInt>(events.size()));
-    } else if (method == "Crash") {
-        std::abort();
-    } else if (method == "Surroundings") {
-        response->SetSuccess(Surroundings());
-    } else if (method == "Caller") {
-        response->SetSuccess(Caller(*request));
-    }
+void EmptyStream(APIRequest*, APIResponse*) {
+    const MultipartResponse nothing;
+}
+
+void Play(APIRequest* request, APIResponse*) {
+    PlayTest(*request);
 }
 
 struct Row {
@@ -166,32 +107,82 @@ struct Row {
     void (*entry)(APIRequest*, APIResponse*);
 };
 
-const Row kTable[] = {{"Test", 1, "Nothing", Serve},
-                      {"Test", 1, "Success", Serve},
-                      {"Test", 1, "Error", Serve},
-                      {"Test", 1, "Silenced", Serve},
-                      {"Test", 1, "Throw", Serve},
-                      {"Test", 1, "ThrowNumber", Serve},
-                      {"Test", 1, "WrongType", Serve},
-                      {"Test", 1, "Raw", Serve},
-                      {"Test", 1, "RawThenThrow", Serve},
-                      {"Test", 1, "EmptyStream", Serve},
-                      {"Test", 1, "Stream", Serve},
-                      {"Test", 1, "LateStream", Serve},
-                      {"Test", 1, "DeafStream", Serve},
-                      {"Test", 1, "Hang", Serve},
-                      {"Test", 1, "Devour", Serve},
-                      {"Test", 1, "Search", Serve},
-                      {"Test", 1, "Crash", Serve},
-                      {"Test", 1, "Surroundings", Serve},
-                      {"Test", 1, "Caller", Serve},
-                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Serve},
-                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", Serve},
-                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Serve},
-                      {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "PeerStream", Serve},
-                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEvent", Play},
-                      {"VEXO.Lookhaven.Player", 1, "PlayMjpegEventNoFrameId", Play},
-                      {nullptr, 0, nullptr, nullptr}};
+const Row kTable[] = {
+    {"Test", 1, "Nothing", Nothing},
+    {"Test", 1, "Success", Success},
+    {"Test", 1, "EmptyStream", EmptyStream},
+    {"Test", 1, "Error",
+     [](APIRequest*, APIResponse* response) {
+         response->SetSuccess(1);
+         response->SetError(401, "param");
+     }},
+    {"Test", 1, "Silenced",
+     [](APIRequest*, APIResponse* response) {
+         response->SetSuccess(1);
+         response->SetEnableOutput(false);
+     }},
+    {"Test", 1, "Throw", [](APIRequest*, APIResponse*) { throw std::runtime_error("thrown on purpose"); }},
+    {"Test", 1, "ThrowNumber", [](APIRequest*, APIResponse*) { throw 5; }},
+    {"Test", 1, "WrongType", [](APIRequest* request, APIResponse*) { request->GetParam("text", 0).asInt(); }},
+    {"Test", 1, "Raw",
+     [](APIRequest*, APIResponse* response) {
+         std::printf("Content-Type: text/plain\r\n\r\nraw");
+         response->SetSuccess("not after raw bytes");
+     }},
+    {"Test", 1, "RawThenThrow",
+     [](APIRequest*, APIResponse*) {
+         std::printf("Content-Type: text/plain\r\n\r\nhalf");
+         throw std::runtime_error("thrown on purpose");
+     }},
+    {"Test", 1, "Stream", [](APIRequest*, APIResponse*) { Stream(0); }},
+    {"Test", 1, "LateStream",
+     [](APIRequest*, APIResponse*) {
+         signal(SIGTERM, SIG_IGN);
+         Stream(30);
+     }},
+    {"Test", 1, "DeafStream",
+     [](APIRequest*, APIResponse*) {
+         signal(SIGTERM, SIG_IGN);
+         Stream(-1);
+     }},
+    {"Test", 1, "Hang",
+     [](APIRequest*, APIResponse*) {
+         for (;;) {
+             pause();
+         }
+     }},
+    {"Test", 1, "Devour",
+     [](APIRequest* request, APIResponse* response) {
+         if (request->GetParam("stream", false).asBool()) {
+             const MultipartResponse nothing;
+         }
+         std::vector<char> much;
+         much.reserve(std::size_t{300} << 20);
+         response->SetSuccess(much.emplace_back());
+     }},
+    {"Test", 1, "Search",
+     [](APIRequest*, APIResponse* response) {
+         std::list<Event> events;
+         EventFilterParam everything;
+         EventListGetAll(events, everything);
+         response->SetSuccess(static_cast<Json::UInt>(events.size()));
+     }},
+    {"Test", 1, "Crash", [](APIRequest*, APIResponse*) { std::abort(); }},
+    {"Test", 1, "Surroundings", [](APIRequest*, APIResponse* response) { response->SetSuccess(Surroundings()); }},
+    {"Test", 1, "Caller", [](APIRequest* request, APIResponse* response) { response->SetSuccess(Caller(*request)); }},
+    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Nothing},
+    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", EmptyStream},
+    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Success},
+    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "PeerStream",
+     [](APIRequest* request, APIResponse*) {
+         const auto given = [request](const char* name) { return request->GetParam(name, "").asString(); };
+         if (IsAuthPairMatch(given("cookie"), given("timestamp"))) {
+             Stream(-1);
+         }
+     }},
+    {"VEXO.Lookhaven.Player", 1, "PlayMjpegEvent", Play},
+    {"VEXO.Lookhaven.Player", 1, "PlayMjpegEventNoFrameId", Play},
+    {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace
 

@@ -3,6 +3,7 @@
 
 #include <csignal>
 #include <cstdio>
+#include <fstream>
 #include <string>
 
 #include <unistd.h>
@@ -24,22 +25,13 @@ void Handle(int number, void (*handler)(int)) {
 }
 
 void WritePlayerFile(const std::string& path) {
-    std::FILE* file = std::fopen(path.c_str(), "w");
-    std::fprintf(file, "%d", getpid());
-    std::fclose(file);
+    std::ofstream(path) << getpid();
 }
 
 void CheckPlayerFile(const std::string& path) {
-    int owner = 0;
-    std::FILE* file = std::fopen(path.c_str(), "r");
-    if (file != nullptr && std::fscanf(file, "%d", &owner) == 1 && owner == getpid()) {
-        g_check = 0;
-    } else {
-        g_stop = 1;
-    }
-    if (file != nullptr) {
-        std::fclose(file);
-    }
+    pid_t owner = 0;
+    std::ifstream(path) >> owner;
+    (owner == getpid() ? g_check : g_stop) = owner != getpid();
 }
 
 }  // namespace

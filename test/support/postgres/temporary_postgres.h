@@ -6,29 +6,27 @@
 //               closes, which a crash or a kill of the test does too.
 #pragma once
 
+#include <cstdio>
 #include <filesystem>
+#include <memory>
 #include <string>
-
-#include <sys/types.h>
-
-#include "standalone/base/file_descriptor.h"
 
 namespace lookhaven::test {
 
 class TemporaryPostgres {
   public:
-    // Starts PostgreSQL 15 and waits until it answers. Throws std::runtime_error when it does not. Call it from a
-    // process with one thread.
+    // Starts PostgreSQL 15 and waits until it answers. Throws std::runtime_error when it does not.
     TemporaryPostgres();
-    ~TemporaryPostgres();
 
     // Makes an empty database and returns its store address.
     std::string NewDatabase();
 
   private:
     std::filesystem::path folder_;
-    base::FileDescriptor alive_;  // the guardian sees its end
-    pid_t guardian_ = 0;
+    struct Close {
+        void operator()(std::FILE* pipe) const { ::pclose(pipe); }  // returns when the guardian has done
+    };
+    std::unique_ptr<std::FILE, Close> guardian_;
     int databases_ = 0;
 };
 

@@ -39,6 +39,9 @@ export class EventList {
     this.root = element("section", { class: "list", "aria-label": "Events" }, this.#head, this.#box);
     this.#box.addEventListener("scroll", () => this.#render());
     this.#box.addEventListener("keydown", (event) => this.#key(event));
+    for (const type of ["wheel", "pointerdown", "keydown"]) {
+      this.#box.addEventListener(type, () => (this.#mustReveal = false), { passive: true });
+    }
     this.#resized.observe(this.#box);
   }
 
@@ -67,11 +70,10 @@ export class EventList {
     return parseFloat(getComputedStyle(this.root).getPropertyValue("--row")) || 44;
   }
 
-  /** Scrolls to a new selection once, as soon as it is listed. */
+  /** Keeps a new selection in sight while more rows come above it, until the user scrolls. */
   #revealSelected(): void {
     const at = this.#mustReveal ? this.#footage.findIndex((one) => isSameFootage(one, this.#selected)) : -1;
     if (at < 0) return;
-    this.#mustReveal = false;
     // The new rows must have made room before it can be scrolled to.
     this.#space.style.height = `${this.#footage.length * this.#rowPx}px`;
     this.#reveal(at);

@@ -35,6 +35,8 @@ export class MapEditor {
   readonly #onLeave = (event: BeforeUnloadEvent) => this.isChanged && event.preventDefault();
   /** Of the map on the server that the changes are based on. */
   #revision: number;
+  /** The save under way; the next one builds on the revision that it makes. */
+  #saving = Promise.resolve();
   #placeable: Placeable[] = [];
   #selected = -1;
 
@@ -77,7 +79,12 @@ export class MapEditor {
   }
 
   /** Where someone else has changed the map, asks the user, unless `overwrite`. */
-  async save(overwrite = false): Promise<void> {
+  save(overwrite = false): Promise<void> {
+    this.#saving = this.#saving.then(() => (overwrite || this.isChanged ? this.#saveNow(overwrite) : undefined));
+    return this.#saving;
+  }
+
+  async #saveNow(overwrite: boolean): Promise<void> {
     this.#save.setAttribute("aria-busy", "true");
     const saving = this.#history.current;
     try {
@@ -242,7 +249,7 @@ export class MapEditor {
     const key = event.key.toLowerCase();
     const isTyping = event.target instanceof HTMLInputElement && event.target.type !== "checkbox";
     if (event.ctrlKey || event.metaKey) {
-      if (key === "s") void (this.isChanged && this.save());
+      if (key === "s") void this.save();
       else if (isTyping) return;
       else if (key === "z" && !event.shiftKey) this.#step("undo");
       else if (key === "y" || (key === "z" && event.shiftKey)) this.#step("redo");

@@ -81,10 +81,12 @@ export class TimeScale {
     return stepMs < kHourMs ? this.#fineTicks(stepMs) : this.#localTicks(stepMs);
   }
 
-  /** Time zones are multiples of fifteen minutes apart, so that steps below an hour need none. */
+  /** On round times of the user's time zone, which may be a quarter of an hour away from UTC's. */
   #fineTicks(stepMs: number): Tick[] {
     const ticks: Tick[] = [];
-    for (let atMs = Math.ceil(this.startMs / stepMs) * stepMs; atMs < this.endMs; atMs += stepMs) {
+    const offsetMs = new Date(this.startMs).getTimezoneOffset() * kMinuteMs;
+    const firstMs = Math.ceil((this.startMs - offsetMs) / stepMs) * stepMs + offsetMs;
+    for (let atMs = firstMs; atMs < this.endMs; atMs += stepMs) {
       ticks.push(tickAt(atMs, stepMs));
     }
     return ticks;

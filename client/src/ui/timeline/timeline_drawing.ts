@@ -5,7 +5,7 @@
 // Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of the one
 //               before are left out, and each colour is filled once, so that dragging is smooth.
 
-import { firstEndingAfter, kindOf, type EventKind, type Segment } from "../../playback/coverage";
+import { kindOf, touching, type EventKind, type Segment } from "../../playback/coverage";
 import { midnights } from "../../playback/recorded_days";
 import type { Footage, FootageRef } from "../../wire/recordings";
 import type { TimeScale } from "./time_scale";
@@ -99,7 +99,8 @@ export function paintLane(
   if (lane.hasDay) return paintDays(context, scale, lane.hasDay, barTop, barPx);
   const strip = (segment: Segment) => [segment.startS, segment.stopS] as const;
   paintBars(context, scale, lane.segments.map(strip), barTop, barPx, kRecorded);
-  const [shown, marks] = visible(lane.footage, scale);
+  const shown = touching(lane.footage, scale.startMs / 1000, scale.endMs / 1000);
+  const marks = shown.filter(({ kind }) => kind !== "event");
   const bars = (kind: EventKind) => shown.filter((one) => kindOf(one) === kind).map((one) => [one.start, one.stop] as const);
   paintBars(context, scale, bars("continuous"), barTop, barPx, kContinuous);
   const chosen = shown.find((one) => one.kind === selected?.kind && one.id === selected.id);
@@ -108,18 +109,6 @@ export function paintLane(
   paintGrowing(context, scale, shown, barTop, barPx, colours);
   for (const mark of marks) paintMark(context, scale, mark, topPx, barTop, colours, mark.id === selected?.id);
   paintTexts(context, scale, marks, topPx, colours);
-}
-
-/** What touches the screen: recordings, and marks. */
-function visible(footage: readonly Footage[], scale: TimeScale): [Footage[], Footage[]] {
-  const [events, marks]: [Footage[], Footage[]] = [[], []];
-  const endS = scale.endMs / 1000;
-  // A mark may lie within a long recording: begin well before the first that ends on the screen.
-  const first = Math.max(0, firstEndingAfter(footage, scale.startMs / 1000) - 8);
-  for (let at = first; at < footage.length && footage[at]!.start < endS; at += 1) {
-    (footage[at]!.kind === "event" ? events : marks).push(footage[at]!);
-  }
-  return [events, marks];
 }
 
 function paintBars(

@@ -2,8 +2,7 @@
 //
 // The maps' screen in a real browser: no way out of its editor loses changes unasked.
 
-import { hasBrowser } from "../../support/browser";
-import { ServedClient } from "../../support/served_client";
+import { hasBrowser, ServedClient } from "../../support/served_client";
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
   const client = new ServedClient();
@@ -20,41 +19,42 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       States: { door: [], io: [] },
     };
     const page = await client.open(`${client.address}#events`, 1440, 900);
-    await page.run(() => (location.hash = "#map=1"));
-    await page.until(() => document.querySelector(".map-item") !== null);
-    await page.press("e");
-    await page.until(() => document.querySelector(".map-editor .map-item") !== null);
-    await page.run(() => {
-      document.body.dataset["asked"] = "0";
-      window.confirm = () => {
-        document.body.dataset["asked"] = String(Number(document.body.dataset["asked"]) + 1);
-        return document.body.dataset["leave"] === "yes";
-      };
-      document.querySelector<HTMLElement>(".map-editor .map-item")!.focus();
+    await page.evaluate(() => (location.hash = "#map=1"));
+    await page.waitForSelector(".map-item");
+    await page.keyboard.press("e");
+    await page.focus(".map-editor .map-item");
+    await page.keyboard.press("ArrowRight");
+    let [asked, leaves] = [0, false];
+    page.on("dialog", async (dialog) => {
+      asked += 1;
+      await (leaves ? dialog.accept() : dialog.dismiss());
     });
-    await page.press("ArrowRight");
     const waysOut = [
-      () => document.querySelector<HTMLElement>(".nav-link")!.click(),
-      () => history.back(),
-      () => document.querySelector<HTMLElement>(".log-out")!.click(),
-      () => void (location.hash = "#map=2"),
-      () => {
-        const maps = document.querySelector<HTMLSelectElement>(".map-names")!;
-        maps.value = "2";
-        maps.dispatchEvent(new Event("change"));
-      },
+      () => page.click(".nav-link"),
+      () => page.evaluate(() => history.back()),
+      () => page.click(".log-out"),
+      () => page.evaluate(() => void (location.hash = "#map=2")),
+      () => page.selectOption(".map-names", "2"),
     ];
     for (const [index, leave] of waysOut.entries()) {
-      await page.run(leave);
-      await page.until((asked) => document.body.dataset["asked"] === asked && location.hash === "#map=1", String(index + 1));
-      const left = () => [document.querySelector<HTMLSelectElement>(".map-names")!.value, document.querySelector<HTMLElement>(".map-editor .map-item")!.style.getPropertyValue("--x")];
-      expect(await page.run(left)).toEqual(["1", "6"]);
+      await leave();
+      await vi.waitFor(() => expect([asked, new URL(page.url()).hash]).toEqual([index + 1, "#map=1"]), 12_000);
+      const x = await page.locator(".map-editor .map-item").evaluate(({ style }) => style.getPropertyValue("--x"));
+      expect([await page.inputValue(".map-names"), x]).toEqual(["1", "6"]);
     }
-    await page.run(() => {
-      document.body.dataset["leave"] = "yes";
-      history.back();
+    const revisions: number[] = [];
+    await page.route(/SaveItems/, (route) => {
+      revisions.push((route.request().postDataJSON() as { revision: number }).revision);
+      return route.fulfill({ json: { success: true, data: { revision: 2 } } });
     });
-    await page.until(() => location.hash === "#events" && document.querySelector(".events") !== null);
-    await client.leave(page);
+    await page.keyboard.press("Control+s");
+    await page.keyboard.press("Control+s");
+    await page.getByText("The map is saved.").waitFor();
+    expect(revisions, "a second request would be taken for someone else's change").toEqual([1]);
+    await page.keyboard.press("ArrowRight");
+    leaves = true;
+    await page.evaluate(() => history.back());
+    await page.waitForSelector(".events");
+    expect(new URL(page.url()).hash).toBe("#events");
   }, 40_000);
 });

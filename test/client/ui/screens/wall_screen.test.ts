@@ -3,8 +3,8 @@
 // The built client in a real browser: which connections it holds, what it says of a silent camera, keyboard and phone.
 
 import { execFileSync } from "node:child_process";
-import { hasBrowser, type Page } from "../../support/browser";
-import { ServedClient, smallControls } from "../../support/served_client";
+import type { Page } from "playwright-core";
+import { hasBrowser, ServedClient, smallControls } from "../../support/served_client";
 
 /** Pictures of H.264 that are white for the first four of each 25, else black. */
 function flashes(): Buffer[] {
@@ -34,84 +34,79 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     for (const id of typeof cameras === "number" ? Array.from({ length: cameras }, (_, index) => index + 1) : cameras)
       server.cameras.push({ id, name: `Camera <b>${id}</b>`, video_type: server.muxed.has(id) ? 3 : 1 });
     const page = await client.open(from, widthPx, heightPx);
-    await page.run(() => document.querySelectorAll("input").forEach((input) => (input.value = "x")));
-    await page.press("Enter");
-    await page.until(() => document.querySelector(".tile[data-state=live]") !== null);
+    for (const input of await page.locator("input").all()) await input.fill("x");
+    await page.keyboard.press("Enter");
+    await page.waitForSelector(".tile[data-state=live]");
     return page;
   }
 
+  /** Of so many tiles. */
+  const allLive = (page: Page, tiles: number) => page.locator(".tile[data-state=live]").nth(tiles - 1).waitFor();
   const open = (streams: string[]) => vi.waitFor(() => expect([...server.streams].sort()).toEqual(streams), 5000);
 
   test("four tiles stream and the others poll in turns; what is not seen has no connection", async () => {
     const page = await loggedIn(9);
     await open(["1/1", "2/1", "3/1", "4/1"]);
-    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 9);
+    await allLive(page, 9);
     await vi.waitFor(() => expect(server.polls).toBeGreaterThan(7), 5000);
     expect(server.mostPollsAtOnce).toBe(1);
     await page.click("[data-camera='3'] .tile-open");
     await open(["3/usual"]);
-    await page.press("Escape");
+    await page.keyboard.press("Escape");
     await open(["1/1", "2/1", "3/1", "4/1"]);
     await page.click("[data-layout='2']");
-    await page.run(() => document.querySelector(".grid")!.scrollTo(0, 1e6));
+    await page.evaluate(() => document.querySelector(".grid")!.scrollTo(0, 1e6));
     await open(["7/1", "8/1", "9/1"]);
-    await page.run(() => {
+    await page.evaluate(() => {
       Object.defineProperty(document, "hidden", { value: true });
       document.dispatchEvent(new Event("visibilitychange"));
     });
     await open([]);
-    await client.leave(page);
   }, 40_000);
 
   test("a silent camera is told from a live one, and comes back", async () => {
     const page = await loggedIn(3);
-    await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
+    await allLive(page, 3);
     server.stalled.add(3);
-    await page.until(() =>
-      /^No signal since \d\d:\d\d:\d\d$/.test(document.querySelector("[data-camera='3'] .message-sentence")!.textContent!),
-    );
-    expect(await page.run(() => document.querySelector(".bar-status")!.textContent)).toBe("3 cameras · 1 without signal");
-    expect(await page.run(() => document.querySelector("[data-camera='1']")!.getAttribute("data-state"))).toBe("live");
+    await page.locator("[data-camera='3'] .message-sentence", { hasText: /^No signal since \d\d:\d\d:\d\d$/ }).waitFor();
+    expect(await page.textContent(".bar-status")).toBe("3 cameras · 1 without signal");
+    expect(await page.getAttribute("[data-camera='1']", "data-state")).toBe("live");
     server.stalled.clear();
-    await page.until(() => document.querySelector("[data-camera='3']")!.getAttribute("data-state") === "live");
-    await client.leave(page);
+    await allLive(page, 3);
   }, 40_000);
 
   test("all can be done with keys; a snapshot opens over the picture and closes without leaving it", async () => {
     const page = await loggedIn(4);
-    await page.run(() => document.querySelector<HTMLElement>("[data-camera='1'] .tile-open")!.focus());
-    await page.press("ArrowDown");
-    await page.press("Enter");
-    const shown = () => document.querySelector(".large-name")?.textContent ?? "";
-    await vi.waitFor(async () => expect(await page.run(shown)).toBe("Camera <b>3</b>"));
-    await page.press("s");
-    await page.until(() => document.querySelector<HTMLAnchorElement>("dialog a")?.download.startsWith("Camera-b-3-b_") ?? false);
-    await page.press("Escape");
-    await page.until(() => !document.querySelector("dialog")!.open);
-    await page.press("ArrowLeft");
-    expect(await page.run(shown)).toBe("Camera <b>2</b>");
-    await page.until(() => document.querySelector(".large[data-state=live]") !== null);
-    await page.press("Escape");
-    await page.until(() => document.activeElement?.closest(".tile")?.getAttribute("data-camera") === "2");
-    await client.leave(page);
+    await page.focus("[data-camera='1'] .tile-open");
+    await page.keyboard.press("ArrowDown");
+    await page.keyboard.press("Enter");
+    await page.locator(".large-name", { hasText: /^Camera <b>3<\/b>$/ }).waitFor();
+    await page.keyboard.press("s");
+    await page.waitForSelector("dialog a[download^=Camera-b-3-b_]");
+    await page.keyboard.press("Escape");
+    await page.waitForSelector("dialog[open]", { state: "detached" });
+    await page.keyboard.press("ArrowLeft");
+    expect(await page.textContent(".large-name")).toBe("Camera <b>2</b>");
+    await page.waitForSelector(".large[data-state=live]");
+    await page.keyboard.press("Escape");
+    await page.waitForSelector(".tile[data-camera='2'] :focus");
   }, 40_000);
 
   test("all kinds of cameras side by side; sound on demand, and the picture in step with it", async () => {
     const page = await loggedIn([13, 1, 2, 3, 12]);
-    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 5);
+    await allLive(page, 5);
     // The camera that cannot be played has left its stream to the last one.
     await open(["1/1", "12/usual", "2/1", "3/1"]);
-    const hints = await page.run(() => [...document.querySelectorAll(".hint")].map((hint) => hint.textContent));
-    expect(hints).toEqual(["This browser cannot play H.265: still pictures", "", "", "", ""]);
-    await page.run(watchSoundAndPicture);
+    expect(await page.locator(".hint").allTextContents()).toEqual(["This browser cannot play H.265: still pictures", "", "", "", ""]);
+    await page.evaluate(watchSoundAndPicture);
     await page.click("[data-camera='12'] .tile-open");
-    await page.until(() => / (2[0-9]) fps$/.test(document.querySelector(".large-description")!.textContent!));
-    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
-    expect(await page.run(() => document.body.dataset["sounds"]), "muted at first").toBe("");
-    await page.press("m");
-    await page.until(() => document.body.dataset["sounds"]!.split(" ").length >= 6);
-    expect(await page.run(() => document.querySelector(".sound")!.textContent)).toBe("Sound on");
-    const { sounds, pictures } = (await page.run(() => ({ ...document.body.dataset }))) as Record<string, string>;
+    await page.locator(".large-description", { hasText: / 2[0-9] fps$/ }).waitFor();
+    await page.locator(".sound", { hasText: "Sound off" }).waitFor();
+    expect(await page.evaluate(() => document.body.dataset["sounds"]), "muted at first").toBe("");
+    await page.keyboard.press("m");
+    await page.waitForFunction(() => document.body.dataset["sounds"]!.split(" ").length >= 6);
+    expect(await page.textContent(".sound")).toBe("Sound on");
+    const { sounds, pictures } = (await page.evaluate(() => ({ ...document.body.dataset }))) as Record<string, string>;
     const seenMs = pictures!.split(" ").map(Number);
     // Of the first second, in which the picture begins to wait for the sound, nothing is asked.
     const offsetsMs = sounds!
@@ -119,41 +114,35 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       .slice(2)
       .map((heard) => Math.min(...seenMs.map((seen) => Math.abs(seen - Number(heard)))));
     expect(Math.max(...offsetsMs.sort((one, other) => one - other).slice(0, -1))).toBeLessThanOrEqual(80);
-    await page.press("m");
-    await page.until(() => document.querySelector(".sound")!.textContent === "Sound off");
-    await client.leave(page);
+    await page.keyboard.press("m");
+    await page.locator(".sound", { hasText: "Sound off" }).waitFor();
   }, 40_000);
 
   test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
     const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
-    await page.until(() => document.querySelectorAll(".tile[data-state=live]").length === 2);
+    await allLive(page, 2);
     await open(["1/1"]);
-    const link = (where: string) => document.querySelector<HTMLAnchorElement>(`${where} a`)?.href;
-    expect(await page.run(link, ".wall-advice")).toBe("https://lan.test:8443/");
+    expect(await page.getAttribute(".wall-advice a", "href")).toBe("https://lan.test:8443/");
     await page.click("[data-camera='12'] .tile-open");
-    await page.until(() => document.querySelector(".large-state")!.textContent === "live, every 2 s");
-    expect(await page.run(link, ".large .hint")).toBe("https://lan.test:8443/#camera=12");
-    await client.leave(page);
+    await page.locator(".large-state", { hasText: /^live, every 2 s$/ }).waitFor();
+    expect(await page.getAttribute(".large .hint a", "href")).toBe("https://lan.test:8443/#camera=12");
   }, 40_000);
 
   test("a session that ends leads to the login", async () => {
     const page = await loggedIn(4);
     server.hasSession = false;
-    await page.until(() => document.querySelector(".login-message")?.textContent === "Your session has ended. Please log in again.");
-    await client.leave(page);
+    await page.locator(".login-message", { hasText: "Your session has ended. Please log in again." }).waitFor();
   }, 40_000);
 
   test("a phone shows one column, and nothing too small for a finger", async () => {
     const page = await loggedIn(4, 390, 844);
-    const columns = () =>
-      new Set([...document.querySelectorAll(".tile")].map((tile) => tile.getBoundingClientRect().left)).size;
-    expect(await page.run(columns)).toBe(1);
-    expect(await page.run(smallControls, "button, a")).toEqual([]);
+    const lefts = await page.locator(".tile").evaluateAll((tiles) => tiles.map((tile) => tile.getBoundingClientRect().left));
+    expect(new Set(lefts).size).toBe(1);
+    expect(await page.evaluate(smallControls, "button, a")).toEqual([]);
     await page.click(".tile-open");
-    await page.until(() => document.querySelector(".large[data-state=live]") !== null);
-    expect(await page.run(smallControls, "button, a")).toEqual([]);
-    expect(await page.run(() => document.documentElement.scrollWidth)).toBe(390);
-    await client.leave(page);
+    await page.waitForSelector(".large[data-state=live]");
+    expect(await page.evaluate(smallControls, "button, a")).toEqual([]);
+    expect(await page.evaluate(() => document.documentElement.scrollWidth)).toBe(390);
   }, 40_000);
 });
 

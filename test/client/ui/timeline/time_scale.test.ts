@@ -15,6 +15,13 @@ test("zooming leaves the time under the pointer in place, and ends at seconds an
   expect(scale.panned(100).startMs).toBe(-100 * scale.msPerPx);
 });
 
+test.each(["UTC", "Asia/Kathmandu", "Australia/Eucla"])("half hours on the axis are those of %s", (zone) => {
+  vi.stubEnv("TZ", zone);
+  const ticks = new TimeScale(Date.UTC(2026, 2, 27), 20_000, 1000).ticks();
+  expect(new Set(ticks.map(({ atMs }) => new Date(atMs).getMinutes()))).toEqual(new Set([0, 30]));
+  vi.unstubAllEnvs();
+});
+
 test("marks on the axis never overlap and stay where they are while it is dragged, at every zoom", () => {
   for (let msPerPx = 15; msPerPx < 4_000_000; msPerPx *= 1.7) {
     const scale = new TimeScale(Date.UTC(2026, 2, 27), msPerPx, 1000);
