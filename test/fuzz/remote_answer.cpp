@@ -11,7 +11,7 @@
 
 #include <dlfcn.h>
 
-#include "standalone/cli/json.h"
+#include "standalone/cli/console.h"
 #include "standalone/cli/pair_text.h"
 #include "standalone/remote/certificate.h"
 #include "standalone/remote/library.h"
@@ -86,11 +86,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         const remote::Expected expected{is_list ? std::span<const std::string_view>(kJson) : kLiveViews,
                                         std::chrono::seconds(5)};
         if (LookhavenFetch({"127.0.0.1", 1, ""}, {"api=a", "b=c"}, expected, viewer) && is_list) {
-            cli::CamerasIn(cli::ParseJson(viewer.text));
+            cli::CamerasInAnswer(viewer.text);
         }
     } catch (const remote::NoAnswer&) {
         fuzz::Require(viewer.text.empty());
-    } catch (const Json::Exception&) {
+    } catch (const cli::Failure&) {
     }
     return 0;
 }
