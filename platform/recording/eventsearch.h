@@ -29,7 +29,7 @@ struct LH_PLATFORM_API EventFilterParam {
 };
 
 // Appends the events that match the filter, in order of start and id, without those that the caller may not play back.
-// Returns 0; non-zero when they cannot be read, which the module takes for an empty list.
+// Returns 0. Throws when they cannot be read, or not held in memory: the module takes the list for all that there is.
 LH_PLATFORM_API int EventListGetAll(std::list<Event>& events, EventFilterParam& filter);
 
 // Stores one byte for each second from "from" on (seconds since the epoch), 0 where nothing was recorded. duration:

@@ -66,14 +66,20 @@ std::string NetworkOf(std::string_view address) {
     return std::string(::inet_ntop(AF_INET6, &bytes, text, sizeof text)) + "/64";
 }
 
-// Throws Failure for who may not log in, or not now. An attempt for which there is no room does not count as one.
-store::VerifiedUser CheckPassword(const Call& call, const std::string& account) {
-    const HashingPlace place(call);
-    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
-    store::LoginThrottle throttle(call.Records());
-    if (const int wait_s = throttle.Enter(account, network, base::WallSeconds()); wait_s > 0) {
+void RefuseUnlessNow(int wait_s) {
+    if (wait_s > 0) {
         throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds", wait_s);
     }
+}
+
+// Throws Failure for who may not log in, or not now. An attempt for which there is no room does not count as one, and one
+// that is barred takes no room.
+store::VerifiedUser CheckPassword(const Call& call, const std::string& account) {
+    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+    store::LoginThrottle throttle(call.Records());
+    RefuseUnlessNow(throttle.Wait(account, network, base::WallSeconds()));
+    const HashingPlace place(call);
+    RefuseUnlessNow(throttle.Enter(account, network, base::WallSeconds()));
     const auto user = store::Users(call.Records()).CheckPassword(account, call.Parameter("password").asString());
     if (!user) {
         throw Failure(401, "wrong account or password");

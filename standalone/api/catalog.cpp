@@ -58,7 +58,9 @@ std::string Mounts(const Call& call) {
     return SuccessAnswer(data);
 }
 
+// The number of items is told to managers alone, for it counts those that a viewer is not shown.
 std::string Emaps(const Call& call) {
+    const bool is_manager = binding::IsManager();
     Json::Value data;
     Json::Value& list = data["emap"] = Json::arrayValue;
     for (const store::EmapSummary& emap : store::Emaps(call.Records()).List()) {
@@ -66,7 +68,9 @@ std::string Emaps(const Call& call) {
             Json::Value& json = list.append(Json::objectValue);
             json["id"] = emap.id;
             json["name"] = emap.name;
-            json["item_num"] = emap.item_count;
+            if (is_manager) {
+                json["item_num"] = emap.item_count;
+            }
         }
     }
     return SuccessAnswer(data);

@@ -22,7 +22,6 @@ namespace lookhaven::api {
 namespace {
 
 constexpr std::int64_t kMaxAheadSeconds = 300;  // a POS terminal's clock may be off
-constexpr std::int64_t kSecondsPerDay = 86'400;
 constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
 constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
@@ -103,15 +102,11 @@ std::string Get(const Call& call) {
                 : AnswerVisible(store::Events(call.Records()).Find(id));
 }
 
-// The caller, who may report and has not yet reported too much.
-store::Reporter RequireReporter(const Call& call, std::int64_t now_s) {
+// The caller, who may report.
+store::Reporter RequireReporter(const Call& call) {
     const auto user = store::Users(call.Records()).Find(static_cast<int>(call.context.Caller()));
     if (!user || (!user->may_mark_as_viewer && !binding::IsManager())) {
         throw Failure(403, "this account may not report events");
-    }
-    if (store::Marks(call.Records()).CountReportedBy(user->id, now_s - kSecondsPerDay) >=
-        store::Settings(call.Records()).NumberOr("marks_per_day", store::kMarksPerDay)) {
-        throw Failure(429, "this account has reported as many events as it may within 24 hours");
     }
     return {user->id, user->name};
 }
@@ -140,14 +135,19 @@ std::string MarkIt(const Call& call) {
     if (camera < 1 || start_s < 1 || length_s < 0 || length_s > store::kMaxMarkSeconds) {
         throw Failure(400, "camera, start or length is out of its bounds");
     }
-    const store::Reporter reporter = RequireReporter(call, now_s);
+    const store::Reporter reporter = RequireReporter(call);
     if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
         throw Failure(404, kNoSuchCamera);
     }
     RequirePlausible(call, camera, start_s, now_s);
-    return SuccessAnswer(
-        Describe(store::Marks(call.Records())
-                     .Add(*kind, camera, start_s, length_s, TextOf(call.Parameter("text")), reporter, now_s)));
+    const std::int64_t max_per_day = store::Settings(call.Records()).NumberOr("marks_per_day", store::kMarksPerDay);
+    try {
+        return SuccessAnswer(Describe(
+            store::Marks(call.Records())
+                .Add(*kind, camera, start_s, length_s, TextOf(call.Parameter("text")), reporter, now_s, max_per_day)));
+    } catch (const store::TooManyMarks& error) {
+        throw Failure(429, error.what());
+    }
 }
 
 // The cameras asked for, or all, without those that the caller may not play back.

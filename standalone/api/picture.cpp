@@ -16,7 +16,9 @@
 
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
+#include "standalone/api/picture_filter.h"
 #include "standalone/base/log.h"
+#include "standalone/base/system_call_filter.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
@@ -50,12 +52,15 @@ std::optional<KeyFrame> NewestKeyFrame(int camera, int stream) {
     return frame;
 }
 
-std::vector<std::uint8_t> Jpeg(KeyFrame frame) {
+std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
     if (frame.codec == "MJPEG") {
         return std::move(frame.data);
     }
     try {
-        return media::LoadDecoderLibrary().Still(frame.codec, frame.data, base::kMaxFrameBytes);
+        const media::DecoderLibrary& decoder = media::LoadDecoderLibrary();
+        call.context.CloseRecords();
+        base::Apply(FilterOfStills());
+        return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());
         throw Failure(504, "the camera's picture cannot be decoded");
@@ -88,7 +93,7 @@ std::string Get(const Call& call) {
         throw Failure(504, "no picture came");
     }
     const std::int64_t captured = frame->capture_millis;
-    return ImageAnswer(Jpeg(*std::move(frame)), captured);
+    return ImageAnswer(Jpeg(call, *std::move(frame)), captured);
 }
 
 constexpr Method kMethods[] = {{"Get", Get}};

@@ -15,6 +15,7 @@
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/log.h"
+#include "standalone/base/system_call_filter.h"
 #include "standalone/binding/rights.h"
 #include "standalone/http/body.h"
 #include "standalone/store/servers.h"
@@ -158,6 +159,9 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     }
     if (call.login && IsPlayer(call)) {
         PreparePlayer(call);
+    }
+    if (IsPlayer(call)) {
+        base::Apply(service.player_filter);
     }
     return RunModule(entry, call);
 }

@@ -3,6 +3,10 @@
 // One request in its own process: read it, admit its caller, run the method, give the answer.
 #pragma once
 
+#include <vector>
+
+#include <linux/filter.h>
+
 #include "standalone/api/admit.h"
 #include "standalone/api/modules.h"
 #include "standalone/base/installation.h"
@@ -15,6 +19,7 @@ struct Service {
     const base::Installation& installation;
     const Modules& modules;
     RequestLimits limits;
+    std::vector<sock_filter> player_filter;  // FilterOfPlayers(), made once for all
 };
 
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down for

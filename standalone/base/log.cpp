@@ -36,9 +36,15 @@ void Log(Severity severity, std::string_view text) noexcept try {
     std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
                        kSeverityNames[static_cast<std::size_t>(severity)] + ": ";
     line += text.substr(0, text.find_last_not_of("\r\n") + 1);
-    // A line stays one line, and nothing in it steers the terminal that shows it.
+    // A line stays one line, and nothing in it steers the terminal that shows it, by a control character of ASCII or,
+    // in UTF-8, of those from U+0080 to U+009F.
     std::replace_if(
         line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7f; }, ' ');
+    for (std::size_t at = line.find('\xc2'); at < line.size() - 1; at = line.find('\xc2', at + 1)) {
+        if (static_cast<unsigned char>(line[at + 1]) < 0xa0) {
+            line.replace(at, 2, 2, ' ');
+        }
+    }
     line += '\n';
     // A log that cannot be written has nobody to tell.
     [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());

@@ -91,25 +91,23 @@ EventFilterParam::EventFilterParam()
       m_CamVdoType(0) {}
 
 int EventListGetAll(std::list<Event>& events, EventFilterParam& filter) {
-    return OrFailure("EventListGetAll", -1, [&] {
-        RequestContext& context = RequestContext::Current();
-        lookhaven::binding::PrepareForManyObjects();
-        std::map<int, std::string> mount_paths;
-        for (const store::Mount& mount : context.Mounts()) {
-            mount_paths[mount.id] = mount.path;
-        }
-        const store::EventFilter asked = FilterOf(filter);
-        std::list<Event> found;
-        store::Events(context.Records()).Visit(asked, [&](const store::Event& event) {
-            found.push_back(lookhaven::binding::PlatformEvent(event, mount_paths[event.mount_id]));
-        });
-        if (asked.camera_ids.size() > 1) {
-            SortByStart(found);
-        }
-        const auto skipped = std::min<std::size_t>(static_cast<std::size_t>(asked.offset), found.size());
-        events.splice(events.end(), found, std::next(found.begin(), static_cast<std::ptrdiff_t>(skipped)), found.end());
-        return 0;
+    RequestContext& context = RequestContext::Current();
+    lookhaven::binding::PrepareForManyObjects();
+    std::map<int, std::string> mount_paths;
+    for (const store::Mount& mount : context.Mounts()) {
+        mount_paths[mount.id] = mount.path;
+    }
+    const store::EventFilter asked = FilterOf(filter);
+    std::list<Event> found;
+    store::Events(context.Records()).Visit(asked, [&](const store::Event& event) {
+        found.push_back(lookhaven::binding::PlatformEvent(event, mount_paths[event.mount_id]));
     });
+    if (asked.camera_ids.size() > 1) {
+        SortByStart(found);
+    }
+    const auto skipped = std::min<std::size_t>(static_cast<std::size_t>(asked.offset), found.size());
+    events.splice(events.end(), found, std::next(found.begin(), static_cast<std::ptrdiff_t>(skipped)), found.end());
+    return 0;
 }
 
 // The camera may have recorded to other mounts before; its recording logs there count too.

@@ -18,6 +18,7 @@
 #include "standalone/camera/camera_process.h"
 #include "standalone/camera/confinement.h"
 #include "standalone/camera/messages.h"
+#include "standalone/camera/only_host.h"
 
 namespace {
 
@@ -51,6 +52,11 @@ void Send(MessageType type, std::span<const std::uint8_t> body = {}, media::Medi
 }
 
 void SendFailure(std::string_view reason) {
+    const std::string redirect =
+        "it redirects to " + RefusedHost() + ", which is not followed: give that address if it is the camera's";
+    if (!RefusedHost().empty()) {
+        reason = redirect;
+    }
     reason = reason.substr(0, kMaxFailureBytes);
     Send(MessageType::kFailure, {reinterpret_cast<const std::uint8_t*>(reason.data()), reason.size()});
 }
@@ -76,6 +82,7 @@ void Confine() {
 
 // Leaves by an exception only.
 void Run(const Request& request) {
+    PermitHostOf(request.url);
     const auto source = media::OpenSource(media::CameraKinds(), request.url, request.options, {});
     if (source->Audio()) {
         Send(MessageType::kFormat, EncodeFormat(*source->Audio()), media::Medium::kAudio);

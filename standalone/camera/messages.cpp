@@ -60,6 +60,7 @@ std::vector<std::uint8_t> EncodeFormat(const media::StreamFormat& format) {
 std::vector<std::uint8_t> EncodeRequest(const Request& request) {
     std::vector<std::uint8_t> bytes;
     AppendNumber(bytes, static_cast<std::int64_t>(request.options.no_data_limit.count()));
+    AppendNumber(bytes, static_cast<std::uint8_t>(request.options.insecure));
     AppendText(bytes, request.url);
     AppendText(bytes, request.options.credentials.user);
     AppendText(bytes, request.options.credentials.password);
@@ -69,6 +70,7 @@ std::vector<std::uint8_t> EncodeRequest(const Request& request) {
 Request DecodeRequest(std::span<const std::uint8_t> bytes) {
     Request request;
     request.options.no_data_limit = std::chrono::milliseconds(TakeNumber<std::int64_t>(bytes));
+    request.options.insecure = TakeNumber<std::uint8_t>(bytes) != 0;
     request.url = TakeText(bytes);
     request.options.credentials.user = TakeText(bytes);
     request.options.credentials.password = TakeText(bytes);

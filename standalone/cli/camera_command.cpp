@@ -28,6 +28,7 @@ constexpr std::chrono::seconds kProbeTimeout{10};
 struct Request {
     int id = 0;
     std::string target;  // of a probe: an id or an address
+    bool insecure = false;
     std::optional<std::string> account;
     store::PortCounts ports;
     CameraOptions options;
@@ -35,9 +36,10 @@ struct Request {
 };
 
 Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
-    Json::Value data = Object("id", camera.id, "name", camera.name, "enabled", camera.enabled, "video_type",
-                              static_cast<int>(camera.video_type), "live_profile", camera.live_profile, "ptz",
-                              camera.ptz, "audio", camera.audio, "recording", PlanData(plan));
+    Json::Value data =
+        Object("id", camera.id, "name", camera.name, "enabled", camera.enabled, "video_type",
+               static_cast<int>(camera.video_type), "live_profile", camera.live_profile, "ptz", camera.ptz, "audio",
+               camera.audio, "insecure", camera.insecure, "recording", PlanData(plan));
     for (const store::CameraProfile& profile : camera.profiles) {
         data["profiles"].append(Object("number", profile.number, "source", profile.source, "width", profile.width,
                                        "height", profile.height, "fps", profile.fps));
@@ -50,7 +52,8 @@ std::string StateText(const Json::Value& enabled) {
 }
 
 std::string FeaturesText(const Json::Value& camera) {
-    return std::string(camera["ptz"].asBool() ? "PTZ " : "") + (camera["audio"].asBool() ? "audio" : "");
+    return std::string(camera["ptz"].asBool() ? "PTZ " : "") + (camera["audio"].asBool() ? "audio " : "") +
+           (camera["insecure"].asBool() ? "insecure" : "");
 }
 
 std::string LiveSourceText(const Json::Value& camera) {
@@ -88,13 +91,14 @@ void RequireSources(const Camera& camera) {
     }
 }
 
-media::ProbeResult Probe(const std::string& source, const std::optional<store::Credentials>& credentials) {
+media::ProbeResult Probe(const std::string& source, bool insecure,
+                         const std::optional<store::Credentials>& credentials) {
     RequireSource(source);
-    media::Credentials login;
+    media::SourceOptions options{{}, kProbeTimeout, insecure};
     if (credentials) {
-        login = {credentials->account, credentials->password};
+        options.credentials = {credentials->account, credentials->password};
     }
-    return media::ProbeSource(pattern::AllSourceKinds(), source, login, kProbeTimeout);
+    return media::ProbeSource(pattern::AllSourceKinds(), source, options);
 }
 
 // None without an account, and for an empty one, which removes the stored one.
@@ -116,7 +120,7 @@ void ProbeMissing(Camera& camera, const Request& request, const std::optional<st
         camera.video_type = base::Codec::kMjpeg;
         return;
     }
-    const media::ProbeResult found = Probe(source, credentials);
+    const media::ProbeResult found = Probe(source, camera.insecure, credentials);
     if (!base::IsVideo(found.video.codec)) {
         throw Failure(kDataError, "the source sends ", base::CodecName(found.video.codec),
                       ", but only MJPEG, H.264 and H.265 are supported");
@@ -203,13 +207,13 @@ media::ProbeResult ProbeTarget(const Console& console, const Request& request) {
     const std::optional<int> id = ParseNumber<int>(request.target);
     if (!id) {
         RequireSource(request.target);  // before a password is asked for
-        return Probe(request.target, AskCredentials(request));
+        return Probe(request.target, request.insecure, AskCredentials(request));
     }
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     const Camera camera = RequireCamera(cameras, *id);
     const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
-    return Probe(live == nullptr ? "" : live->source,
+    return Probe(live == nullptr ? "" : live->source, camera.insecure || request.insecure,
                  request.account ? AskCredentials(request) : cameras.FindCredentials(*id));
 }
 
@@ -259,7 +263,8 @@ void AddCamera(CLI::App& program, const Console& console) {
         .Option("--outputs", request.ports.outputs, "Number of outputs (default: 0)");
     group.Add("probe", "Opens a source and shows what it sends", ShowProbe)
         .Option("target", request.target, "A camera's id, or an address", Required)
-        .Option("--account", request.account, account);
+        .Option("--account", request.account, account)
+        .Flag("--insecure", request.insecure, "Takes any HTTPS certificate");
 }
 
 }  // namespace lookhaven::cli

@@ -51,7 +51,9 @@ void CameraOptions::AddTo(Command& command) {
         .Option("--live", live_profile_, "The profile shown in the live view (initially high)", OneOf(kProfiles))
         .Switch("--enable,!--disable", enabled_, "Whether it is shown and recorded")
         .Switch("--ptz,!--no-ptz", ptz_, "Whether it can pan, tilt and zoom")
-        .Switch("--audio,!--no-audio", audio_, "Whether it sends audio");
+        .Switch("--audio,!--no-audio", audio_, "Whether it sends audio")
+        .Switch("--insecure,!--secure", insecure_,
+                "Whether its HTTPS certificate may be any (initially one that this machine trusts)");
     for (const auto& [name, number] : kProfiles) {
         ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";
@@ -72,6 +74,7 @@ void CameraOptions::ApplyTo(Camera& camera) const {
     AssignIfGiven(camera.enabled, enabled_);
     AssignIfGiven(camera.ptz, ptz_);
     AssignIfGiven(camera.audio, audio_);
+    AssignIfGiven(camera.insecure, insecure_);
     for (int number = 0; number < store::kProfileCount; ++number) {
         const ProfileOptions& given = profiles_[static_cast<std::size_t>(number)];
         if (given.source && given.source->empty()) {

@@ -37,6 +37,7 @@ class CameraOptions {
     std::optional<bool> enabled_;
     std::optional<bool> ptz_;
     std::optional<bool> audio_;
+    std::optional<bool> insecure_;
     std::array<ProfileOptions, store::kProfileCount> profiles_;
 };
 

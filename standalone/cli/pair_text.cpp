@@ -12,13 +12,7 @@ namespace {
 
 constexpr std::string_view kPrefix = "lookhaven-pair-1:";
 
-PairOffer Read(const Json::Value& json) {
-    return {json["address"].asString(), json["port"].asInt(), json["certificate"].asString(), json["secret"].asString(),
-            CamerasIn(json["cameras"])};
-}
-
-}  // namespace
-
+// Throws Json::Exception for a member of the wrong type.
 std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
     std::vector<store::RemoteCamera> cameras;
     for (const Json::Value& camera : list) {
@@ -28,6 +22,23 @@ std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
                            .audio = camera["audio"].asBool()});
     }
     return cameras;
+}
+
+PairOffer Read(const Json::Value& json) {
+    return {json["address"].asString(), json["port"].asInt(), json["certificate"].asString(), json["secret"].asString(),
+            CamerasIn(json["cameras"])};
+}
+
+}  // namespace
+
+std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text) try {
+    const Json::Value json = ParseJson(text);
+    if (json.isObject() && json["data"].isObject() && json["data"]["camera"].isArray()) {
+        return CamerasIn(json["data"]["camera"]);
+    }
+    throw Failure(kDataError, "an answer that cannot be understood");
+} catch (const Json::Exception&) {
+    throw Failure(kDataError, "an answer with a member of the wrong type");
 }
 
 std::string ToText(const PairOffer& offer) {

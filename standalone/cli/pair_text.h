@@ -20,9 +20,9 @@ struct PairOffer {
     std::vector<store::RemoteCamera> cameras;  // server_id is 0
 };
 
-// The cameras of a host as its line and its web API tell them; server_id is 0. Throws Json::Exception for a member of
-// the wrong type.
-std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list);
+// The cameras in what a host's VEXO.Pairing answers to Cameras; server_id is 0. Throws Failure kDataError for any other
+// text.
+std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text);
 
 std::string ToText(const PairOffer& offer);
 

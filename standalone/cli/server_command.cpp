@@ -5,6 +5,7 @@
 // Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one
 //               that is to show them: the host's address and certificate, its cameras, and a secret that only the two
 //               share.
+#include <future>
 #include <iostream>
 
 #include <unistd.h>
@@ -166,31 +167,31 @@ void ListCameras(const Console& console) {
     console.Answer(data, Table(kCameraColumns, data));
 }
 
-// Returns how many cameras are new here.
-int RefreshCameras(RecordingServers& servers, const RecordingServer& server) {
+std::vector<RemoteCamera> AskForCameras(const RecordingServer& server, const std::string& secret) {
     const std::string timestamp = std::to_string(base::WallSeconds());
-    const std::string token = store::MakePairToken(servers.FindSecret(server.id), timestamp);
-    const Json::Value json = ParseJson(remote::FetchJson(
+    const std::string token = store::MakePairToken(secret, timestamp);
+    return CamerasInAnswer(remote::FetchJson(
         {server.address, server.port, server.certificate},
         {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));
-    if (!json.isObject() || !json["data"].isObject() || !json["data"]["camera"].isArray()) {
-        throw Failure(kDataError, "an answer that cannot be understood");
-    }
-    return servers.PutCameras(server.id, CamerasIn(json["data"]["camera"]));
 }
 
-// One server that fails does not keep the others from being asked.
+// All are asked at once, so that one that fails or is slow keeps no other from being asked.
 void Refresh(const Console& console) {
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
+    std::vector<std::pair<RecordingServer, std::future<std::vector<RemoteCamera>>>> asked;
+    for (const RecordingServer& server : servers.List()) {
+        if (server.enabled && !server.address.empty()) {
+            asked.emplace_back(server,
+                               std::async(std::launch::async, AskForCameras, server, servers.FindSecret(server.id)));
+        }
+    }
     Json::Value data = Json::arrayValue;
     std::string failures;
-    for (const RecordingServer& server : servers.List()) {
-        if (!server.enabled || server.address.empty()) {
-            continue;
-        }
+    for (auto& [server, cameras] : asked) {
         try {
-            data.append(Object("id", server.id, "name", server.name, "new", RefreshCameras(servers, server)));
+            data.append(
+                Object("id", server.id, "name", server.name, "new", servers.PutCameras(server.id, cameras.get())));
         } catch (const std::exception& failure) {
             failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure.what());
         }

@@ -107,6 +107,10 @@ std::int64_t MountSpace::ReserveBytes() const {
     return std::clamp(total_bytes / 50, 2 * kMiB, 512 * kMiB);
 }
 
+std::int64_t MountSpace::ReserveFiles() const {
+    return std::min<std::int64_t>(total_files / 50, 10'000);
+}
+
 void MountFolder::WriteMarker(const std::filesystem::path& folder, const MountMark& mark) {
     archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mark), 0644);
 }
@@ -139,7 +143,8 @@ MountSpace MountFolder::Space() const {
         base::ThrowErrno("cannot find out the free space on " + path_.string());
     }
     const auto block = static_cast<std::int64_t>(status.f_frsize);
-    return {static_cast<std::int64_t>(status.f_blocks) * block, static_cast<std::int64_t>(status.f_bavail) * block};
+    return {static_cast<std::int64_t>(status.f_blocks) * block, static_cast<std::int64_t>(status.f_bavail) * block,
+            static_cast<std::int64_t>(status.f_files), static_cast<std::int64_t>(status.f_favail)};
 }
 
 base::FileDescriptor MountFolder::OpenDay(int camera, std::int64_t second) const {

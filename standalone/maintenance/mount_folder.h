@@ -24,10 +24,14 @@ namespace lookhaven::maintenance {
 
 struct MountSpace {
     std::int64_t total_bytes = 0;
-    std::int64_t free_bytes = 0;  // available to this process, not to root
+    std::int64_t free_bytes = 0;   // available to this process, not to root
+    std::int64_t total_files = 0;  // that the file system has room for; 0 where it has no such limit
+    std::int64_t free_files = 0;
 
     // What recording leaves free: a fiftieth of the disk, 2 MiB … 512 MiB.
     std::int64_t ReserveBytes() const;
+    // The same of files, 10,000 at most.
+    std::int64_t ReserveFiles() const;
 };
 
 // Whether the error says that there is no such file. Any other says nothing of what lies there.

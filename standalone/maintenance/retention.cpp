@@ -19,6 +19,7 @@ namespace {
 
 constexpr int kEventsAtOnce = 100;
 constexpr int kMarksAtOnce = 100;
+constexpr std::int64_t kFilesOfEvent = 2;  // with its index
 // So many events with dates in the future are looked past.
 constexpr std::size_t kMaxMisdated = 10'000;
 
@@ -45,7 +46,9 @@ class Retention {
 
     RetentionResult Run() {
         FinishRemovals();
-        excess_bytes_ = Excess();
+        const MountSpace space = folder_.Space();
+        excess_bytes_ = ExcessBytes(space);
+        excess_files_ = ExcessFiles(space);
         // Dated in the future: as old as what was recorded after them.
         std::vector<store::Event> misdated;
         int after = 0;
@@ -108,21 +111,28 @@ class Retention {
 
   private:
     // Bytes to delete whatever their age.
-    std::int64_t Excess() {
+    std::int64_t ExcessBytes(const MountSpace& space) {
         std::int64_t excess = 0;
         if (mount_.max_bytes > 0) {
             excess = events_.Content(mount_.id).size_bytes - mount_.max_bytes;
         }
-        const MountSpace space = folder_.Space();
         if (space.free_bytes < 2 * space.ReserveBytes()) {
             excess = std::max(excess, 3 * space.ReserveBytes() - space.free_bytes);
         }
         return excess;
     }
 
+    // Tiny files, as of a camera whose format changes all the time, fill a file system before their bytes do.
+    static std::int64_t ExcessFiles(const MountSpace& space) {
+        return space.free_files < 2 * space.ReserveFiles() ? 3 * space.ReserveFiles() - space.free_files : 0;
+    }
+
     // Of what precedes it, all is in excess.
     bool IsInExcess(const store::Event& event) {
-        return std::exchange(chosen_bytes_, chosen_bytes_ + event.size_bytes) < excess_bytes_;
+        const bool is_in_excess = chosen_bytes_ < excess_bytes_ || chosen_files_ < excess_files_;
+        chosen_bytes_ += event.size_bytes;
+        chosen_files_ += kFilesOfEvent;
+        return is_in_excess;
     }
 
     // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a
@@ -232,6 +242,8 @@ class Retention {
     const bool has_age_limit_;
     std::int64_t excess_bytes_ = 0;
     std::int64_t chosen_bytes_ = 0;
+    std::int64_t excess_files_ = 0;
+    std::int64_t chosen_files_ = 0;
     RetentionResult deleted_;
 };
 

@@ -3,6 +3,7 @@
 
 #include <array>
 #include <mutex>
+#include <utility>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
@@ -21,6 +22,9 @@ namespace {
 // Twice the samples of a plane, because of padding.
 constexpr std::size_t kMaxBlockBytes = std::size_t{2} * base::kMaxSidePixels * base::kMaxSidePixels;
 
+// Its error code says no more than "Input/output error".
+thread_local std::string certificate_problem;
+
 void WriteAvLog(void* object, int level, const char* format, va_list arguments) {
     if (level > AV_LOG_WARNING) {
         return;
@@ -28,7 +32,12 @@ void WriteAvLog(void* object, int level, const char* format, va_list arguments) 
     std::array<char, 1024> line{};
     int print_prefix = 1;
     av_log_format_line2(object, level, format, arguments, line.data(), static_cast<int>(line.size()), &print_prefix);
-    base::Log(base::Severity::kDebug, RedactSecrets(line.data()));
+    const std::string_view text(line.data());
+    if (text.starts_with("[tls @") && text.find("certificate") != text.npos) {
+        const std::size_t begin = text.find("] ") + 2;
+        certificate_problem = text.substr(begin, text.find_last_not_of('\n') + 1 - begin);
+    }
+    base::Log(base::Severity::kDebug, RedactSecrets(text));
 }
 
 }  // namespace
@@ -40,6 +49,10 @@ int CheckAv(int result, std::string_view what) {
         throw SourceError(std::string(what) + ": " + text.data());
     }
     return result;
+}
+
+std::string TakeCertificateProblem() {
+    return std::exchange(certificate_problem, {});
 }
 
 void PrepareAv() {

@@ -60,6 +60,9 @@ AvPtr<T> OwnAv(T* object) {
     return AvPtr<T>(object);
 }
 
+// Why libav's TLS client last refused a certificate on this thread; empty when it did not. Forgets it.
+std::string TakeCertificateProblem();
+
 // Sends libav's log lines to ours, at debug level and without secrets: whatever matters is returned as an error too,
 // and a broken camera would fill the log with a line per frame. Limits libav's single allocations to what a picture of
 // base::kMaxSidePixels needs, whatever a camera claims. Only the first call in a process does anything.

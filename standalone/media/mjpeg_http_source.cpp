@@ -17,11 +17,13 @@ namespace lookhaven::media {
 
 namespace {
 
+constexpr const char* kMaxRedirects = "3";
+
 class MjpegHttpSource : public Source {
   public:
     MjpegHttpSource(const std::string& url, const SourceOptions& options, std::stop_token stop)
         : deadline_(std::move(stop), options.no_data_limit),
-          connection_(Connect(url, options.credentials)),
+          connection_(Connect(url, options)),
           reader_(Boundary(), base::kMaxFrameBytes,
                   [this](std::span<std::uint8_t> buffer) { return Receive(buffer); }) {}
 
@@ -41,17 +43,26 @@ class MjpegHttpSource : public Source {
     }
 
   private:
-    AvPtr<AVIOContext> Connect(const std::string& url, const Credentials& credentials) {
-        AvOptions options;
-        options.Set("protocol_whitelist", "http,https,tls,tcp").Set("user_agent", "lookhaven");
+    AvPtr<AVIOContext> Connect(const std::string& url, const SourceOptions& options) {
+        AvOptions av_options;
+        av_options.Set("protocol_whitelist", "http,https,tls,tcp")
+            .Set("user_agent", "lookhaven")
+            .Set("max_redirects", kMaxRedirects)
+            .Set("tls_verify", options.insecure ? "0" : "1");
         // Cameras are reached directly, whatever proxy the environment names.
-        options.Set("http_proxy", "none");
+        av_options.Set("http_proxy", "none");
         AVIOContext* connection = nullptr;
         const AVIOInterruptCB interrupt = deadline_.Callback();
-        const int opened = avio_open2(&connection, WithCredentials(url, credentials).c_str(), AVIO_FLAG_READ,
-                                      &interrupt, options.Get());
+        TakeCertificateProblem();  // of an earlier camera
+        const int opened = avio_open2(&connection, WithCredentials(url, options.credentials).c_str(), AVIO_FLAG_READ,
+                                      &interrupt, av_options.Get());
         if (opened < 0) {
             deadline_.Check();
+            if (const std::string problem = TakeCertificateProblem(); !problem.empty()) {
+                throw SourceError("its TLS certificate is refused (" + problem +
+                                  "): have an authority that this machine trusts sign it, or accept any certificate"
+                                  " of this camera with --insecure");
+            }
             CheckAv(opened, "cannot open");
         }
         return AvPtr<AVIOContext>(connection);

@@ -10,9 +10,8 @@ constexpr std::int64_t kWatchUs = 1'500'000;
 
 }  // namespace
 
-ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const Credentials& credentials,
-                        std::chrono::milliseconds limit) {
-    const std::unique_ptr<Source> source = OpenSource(kinds, url, {credentials, limit}, {});
+ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options) {
+    const std::unique_ptr<Source> source = OpenSource(kinds, url, options, {});
     ProbeResult result;
     result.audio = source->Audio();
     std::int64_t first_us = 0;

@@ -3,7 +3,6 @@
 // Finds out what a source sends.
 #pragma once
 
-#include <chrono>
 #include <optional>
 #include <string>
 
@@ -18,8 +17,7 @@ struct ProbeResult {
 };
 
 // Opens the source and reads up to a second and a half of it. Throws SourceError when it cannot be opened or no picture
-// comes within the limit.
-ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const Credentials& credentials,
-                        std::chrono::milliseconds limit);
+// comes within the limit of the options.
+ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options);
 
 }  // namespace lookhaven::media

@@ -40,6 +40,8 @@ struct SourceOptions {
     Credentials credentials;
     // A source that delivers no picture for this long fails, even while sound still flows.
     std::chrono::milliseconds no_data_limit{10'000};
+    // Takes any TLS certificate, not only one for the host's name of an authority that this machine trusts.
+    bool insecure = false;
 };
 
 class Source {

@@ -58,7 +58,7 @@ void Catalog::Read(store::Store& store) {
         }
         const std::optional<store::Credentials> credentials = cameras.FindCredentials(camera.id);
         for (const store::CameraProfile& profile : camera.profiles) {
-            StreamPlan plan{camera.name, profile.source, {}};
+            StreamPlan plan{camera.name, profile.source, {}, camera.insecure};
             if (credentials) {
                 plan.credentials = {credentials->account, credentials->password};
             }

@@ -28,7 +28,7 @@ StreamWorker::StreamWorker(const base::Installation& installation, const media::
       kinds_(kinds),
       stream_(stream),
       plan_(std::move(plan)),
-      options_{plan_.credentials, no_data_limit},
+      options_{plan_.credentials, no_data_limit, plan_.insecure},
       backoff_(static_cast<std::uint32_t>(base::MonotonicMicros())) {
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });

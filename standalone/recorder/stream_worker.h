@@ -27,9 +27,12 @@ struct StreamPlan {
     std::string camera_name;
     std::string url;
     media::Credentials credentials;
+    bool insecure = false;  // as in media::SourceOptions
 
     // Whether a running stream can go on: renaming a camera does not interrupt it.
-    bool HasSourceOf(const StreamPlan& other) const { return url == other.url && credentials == other.credentials; }
+    bool HasSourceOf(const StreamPlan& other) const {
+        return url == other.url && credentials == other.credentials && insecure == other.insecure;
+    }
 };
 
 class StreamWorker {

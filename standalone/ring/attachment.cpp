@@ -6,6 +6,7 @@
 
 #include <sys/ipc.h>
 #include <sys/mman.h>
+#include <unistd.h>
 
 #include "standalone/base/file.h"
 
@@ -18,10 +19,16 @@ std::size_t LeadBytes() {
     return static_cast<std::size_t>(SHMLBA);
 }
 
+// What a segment takes: the kernel rounds to pages, which may be smaller than the lead.
+std::size_t WholePages(std::size_t bytes) {
+    const auto page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+    return (bytes + page - 1) / page * page;
+}
+
 // Address space for a segment with writable memory of this process in front of it. Returns the segment's address.
 unsigned char* ReserveSpace(std::size_t segment_bytes) {
     const std::size_t lead = LeadBytes();
-    const std::size_t segment = (segment_bytes + lead - 1) / lead * lead;
+    const std::size_t segment = WholePages(segment_bytes);
     const std::size_t total = segment + 2 * lead;
     void* space = ::mmap(nullptr, total, PROT_NONE, MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0);
     if (space == MAP_FAILED) {
@@ -66,8 +73,7 @@ Attachment::Attachment(int shm_id, uid_t user) : shm_id_(shm_id) {
     unsigned char* address = ReserveSpace(status.shm_segsz);
     if (::shmat(shm_id, address, SHM_REMAP) == reinterpret_cast<void*>(-1)) {
         const int error = errno;
-        const std::size_t lead = LeadBytes();
-        ::munmap(address - lead, lead + (status.shm_segsz + lead - 1) / lead * lead);
+        ::munmap(address - LeadBytes(), LeadBytes() + WholePages(status.shm_segsz));
         errno = error;
         base::ThrowErrno("cannot attach shared memory");
     }

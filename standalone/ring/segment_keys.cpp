@@ -90,13 +90,11 @@ Attachment MakeUnderKey(std::uint64_t installation, const StreamId& id, const Ge
     bool reported = false;
     for (std::uint32_t i = 0; i < kKeysPerStream; ++i) {
         const key_t key = keys.At(i);
-        if (const int holder = ::shmget(key, 0, 0); holder >= 0) {
-            shmid_ds status{};
-            if (::shmctl(holder, IPC_STAT, &status) == 0 && IsOwn(status)) {
-                RemoveIfAbandoned(installation, holder);
-            } else if (!std::exchange(reported, true)) {
-                ReportTakenKey(key, holder, id);
-            }
+        const int holder = ::shmget(key, 0, 0);
+        shmid_ds status{};
+        const bool is_own = holder >= 0 && ::shmctl(holder, IPC_STAT, &status) == 0 && IsOwn(status);
+        if (is_own) {
+            RemoveIfAbandoned(installation, holder);
         }
         const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | kSegmentMode);
         if (shm_id >= 0) {
@@ -104,6 +102,10 @@ Attachment MakeUnderKey(std::uint64_t installation, const StreamId& id, const Ge
         }
         if (errno != EEXIST) {
             break;
+        }
+        // One that has gone meanwhile has kept nothing from us.
+        if (holder >= 0 && !is_own && !std::exchange(reported, true)) {
+            ReportTakenKey(key, holder, id);
         }
     }
     base::ThrowErrno("cannot make a ring of " + std::to_string(SegmentBytes(geometry)) + " bytes of shared memory");

@@ -54,10 +54,10 @@ void RequireValid(const Camera& camera) {
 template <>
 struct Mapping<Camera> {
     static constexpr const char* kTable = "cameras";
-    static constexpr const char* kColumns = "id, name, enabled, video_type, live_profile, ptz, audio";
+    static constexpr const char* kColumns = "id, name, enabled, video_type, live_profile, ptz, audio, insecure";
     static auto Members(auto& camera) {
         return std::tie(camera.id, camera.name, camera.enabled, camera.video_type, camera.live_profile, camera.ptz,
-                        camera.audio);
+                        camera.audio, camera.insecure);
     }
 };
 

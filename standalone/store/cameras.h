@@ -33,6 +33,7 @@ struct Camera {
     int live_profile = 0;  // the number of the profile that the live view shows
     bool ptz = false;
     bool audio = false;
+    bool insecure = false;                // its HTTPS certificate is not verified
     std::vector<CameraProfile> profiles;  // by number, at least the live one
 
     // Null when the camera lacks that profile.

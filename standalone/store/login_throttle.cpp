@@ -41,6 +41,14 @@ int LoginThrottle::Enter(std::string_view account, std::string_view address, std
     });
 }
 
+int LoginThrottle::Wait(std::string_view account, std::string_view address, std::int64_t now_s) {
+    return connection_
+        .FetchOne<int>("select since + :window - :now from login_attempts where origin = :origin"
+                       " and attempts >= :limit and since > :over and since <= :at",
+                       kWindowS, now_s, Origin(account, address), kAttempts, now_s - kWindowS, now_s)
+        .value_or(0);
+}
+
 void LoginThrottle::Clear(std::string_view account, std::string_view address) {
     connection_.Execute("delete from login_attempts where origin = :origin", Origin(account, address));
 }

@@ -22,6 +22,8 @@ class LoginThrottle {
     // 0: go on. Otherwise the seconds after which the next attempt may be made; the password must not be checked
     // then. Account and address may hold any bytes; the account need not exist.
     int Enter(std::string_view account, std::string_view address, std::int64_t now_s);
+    // What Enter would return; no attempt counts.
+    int Wait(std::string_view account, std::string_view address, std::int64_t now_s);
 
     void Clear(std::string_view account, std::string_view address);
 

@@ -27,6 +27,7 @@ struct Mapping<Mark> {
 namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
+constexpr std::int64_t kSecondsPerDay = 86'400;
 constexpr std::int64_t kMaxFootageSeconds = kMaxMarkSeconds + 2 * kMaxAroundMarkSeconds;
 constexpr std::int64_t kLastMoment = std::numeric_limits<int>::max();  // clients count in 31 bits
 
@@ -57,6 +58,16 @@ void RequireMark(const Mark& mark) {
     }
 }
 
+// The command line reports as much as it likes.
+void RequireWithin(soci::session& sql, std::int64_t max_per_day, const Reporter& reporter, std::int64_t now_s) {
+    const auto reported = FetchOne<std::int64_t>(
+        sql, "select count(*) from marks where reporter_id = :user and reporter_id <> 0 and reported_s > :since",
+        reporter.user_id, now_s - kSecondsPerDay);
+    if (reported.value() >= max_per_day) {
+        throw TooManyMarks();
+    }
+}
+
 std::vector<Mark> OfCamera(soci::session& sql, const MarkFilter& filter, int camera, std::int64_t limit) {
     const std::int64_t earliest = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
     return FetchAll<Mark>(
@@ -74,7 +85,7 @@ const char* NameOf(MarkState state) {
 }
 
 Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
-                const Reporter& reporter, std::int64_t now_s) {
+                const Reporter& reporter, std::int64_t now_s, std::int64_t max_per_day) {
     if (moment_s < 0 || moment_s > kLastMoment || length_s < 0 || length_s > kMaxMarkSeconds) {
         throw InvalidRecord("a mark is of a moment since 1970 and lasts 0 to 3600 seconds");
     }
@@ -95,18 +106,11 @@ Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_
         mark.start_s = std::max<std::int64_t>(moment_s - plan.pre_s, 0);
         mark.end_s = moment_s + length_s + plan.post_s;
         RequireMark(mark);
-        mark.id = NextId(sql, "event");
+        mark.id = NextId(sql, "event");  // here writers queue, so that each counts what all before it have added
+        RequireWithin(sql, max_per_day, reporter, now_s);
         Insert(sql, mark);
         return mark;
     });
-}
-
-int Marks::CountReportedBy(int user_id, std::int64_t since_s) {
-    return connection_
-        .FetchOne<int>("select count(*) from marks where reporter_id = :user and reporter_id <> 0"
-                       " and reported_s >= :since",
-                       user_id, since_s)
-        .value();
 }
 
 void Marks::AddAll(const std::vector<Mark>& marks) {

@@ -11,6 +11,7 @@
 #include <limits>
 #include <optional>
 #include <set>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -70,6 +71,11 @@ struct MarkFilter {
     int limit = std::numeric_limits<int>::max();
 };
 
+class TooManyMarks : public std::runtime_error {
+  public:
+    TooManyMarks() : std::runtime_error("this account has reported as many events as it may within 24 hours") {}
+};
+
 class Marks {
   public:
     // The store must outlive this object.
@@ -77,11 +83,12 @@ class Marks {
 
     // Stores a pending mark and returns it with its id and with the span that the camera's recording plan asks for.
     // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
-    // characters but line ends. now_s: when it was reported. Throws InvalidRecord, or NotFound for an unknown camera.
+    // characters but line ends. now_s: when it was reported. max_per_day: as many as that, of those that there are, may
+    // an account have reported within 24 hours, however many report at once. Throws InvalidRecord, NotFound for an
+    // unknown camera, TooManyMarks.
     Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
-             const Reporter& reporter = {}, std::int64_t now_s = 0);
-    // How many of the marks that there are the account has reported since then.
-    int CountReportedBy(int user_id, std::int64_t since_s);
+             const Reporter& reporter = {}, std::int64_t now_s = 0,
+             std::int64_t max_per_day = std::numeric_limits<std::int64_t>::max());
     // Stores rows as they are but under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(const std::vector<Mark>& marks);
 

@@ -138,12 +138,19 @@ constexpr const char* kDisks[] = {
     "insert into recorder_lease (count, holder, first_own_id) values (0, '', 2147483647)",
 };
 
+// Certificates were not verified until then: cameras that were recorded so stay recorded.
+constexpr const char* kVerifiedCameras[] = {
+    "alter table cameras add column insecure integer not null default 0",
+    "update cameras set insecure = 1 where id in (select camera_id from camera_profiles where source like 'https:%')",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
     {"e-maps, their devices, recording servers", kEmaps},
     {"who reported a mark, and who may", kReporters},
     {"events in removal, the order of recording, the recorder's role", kDisks},
+    {"cameras whose HTTPS certificate is not verified", kVerifiedCameras},
 };
 
 }  // namespace

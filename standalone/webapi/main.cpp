@@ -11,6 +11,7 @@
 #include <sysexits.h>
 
 #include "standalone/api/modules.h"
+#include "standalone/api/picture_filter.h"
 #include "standalone/api/serve.h"
 #include "standalone/api/session_watcher.h"
 #include "standalone/base/installation.h"
@@ -77,7 +78,7 @@ void Run(const Options& options) {
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
-    const api::Service service{installation, modules, options.requests};
+    const api::Service service{installation, modules, options.requests, api::FilterOfPlayers()};
     const host::ChildWork work{
         .serve_request = [&service](http::Request& request, control::SlotTable& slots,
                                     control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },

@@ -13,6 +13,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/base/log.h"
 #include "standalone/base/process.h"
 #include "test/support/folder.h"
 #include "test/support/process.h"
@@ -102,6 +103,14 @@ TEST_F(FileTest, OneStateFolderIsOneInstallationUnderAnyName) {
     WriteFileAtomically(path_ / "home" / "store", "postgresql://host/db\n");
     EXPECT_EQ(Installation(path_ / "home").StoreUrl(), "postgresql://host/db");
     EXPECT_EQ(Installation(path_ / "other").StoreUrl(), "sqlite:" + (path_ / "other" / "lookhaven.db").string());
+}
+
+TEST(LogTest, ALineSteersNoTerminal) {
+    testing::internal::CaptureStderr();
+    base::LogInfo("a\nb\x1b[2J\xc2\x9b"
+                  "2J\xc3\x9b\xc2\xa0\xc2");
+    const std::string line = testing::internal::GetCapturedStderr();
+    EXPECT_TRUE(line.ends_with(" info: a b [2J  2J\xc3\x9b\xc2\xa0\xc2\n")) << line;
 }
 
 TEST(ClockTest, DatesAreUtcWithMilliseconds) {

@@ -170,6 +170,9 @@ TEST_F(FootageBinding, FindsEventsAndTheirSeconds) {
                                          {camera.GetStoragePath(), -1}}) {
         EXPECT_NE(ReadRecLog(path, kNoon, duration, bytes), 0) << path << duration;
     }
+    RequestContext::Current().CloseRecords();
+    std::filesystem::remove(folder_ / "lookhaven.db");
+    EXPECT_THROW(EventListGetAll(events, fresh), store::StoreError) << "an empty list would say that there is nothing";
 }
 
 TEST(FillRecLogMap, GivesRunsOfSteps) {

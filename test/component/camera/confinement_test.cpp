@@ -39,6 +39,11 @@ bool OpensSocket(int family) {
     return ::socket(family, SOCK_STREAM, 0) >= 0;
 }
 
+bool SetsOption(int level, int option) {
+    const int one = 1;
+    return ::setsockopt(::socket(AF_INET, SOCK_DGRAM, 0), level, option, &one, sizeof one) == 0;
+}
+
 bool Listens() {
     return ::listen(::socket(AF_INET, SOCK_STREAM, 0), 1) == 0;
 }
@@ -111,6 +116,8 @@ TEST(Confinement, LeavesNothingButTheWayToTheCamera) {
         {"opens a local socket", [] { return OpensSocket(AF_UNIX); }},
         {"opens a socket of a rare protocol", [] { return ::socket(AF_INET, SOCK_DGRAM, IPPROTO_UDPLITE) >= 0; }},
         {"listens", Listens},
+        {"sends to everybody", [] { return SetsOption(SOL_SOCKET, SO_BROADCAST); }},
+        {"asks for errors of the network", [] { return SetsOption(SOL_IP, IP_RECVERR); }, true},
         {"connects", Connects, true},
         {"resolves a name", ResolvesName, true},
     };

@@ -141,7 +141,11 @@ TEST_F(DoctorTest, EachFaultIsFoundWithItsRemedy) {
         EXPECT_THAT(outcome.text, HasSubstr(row.remedy)) << row.fault;
         EXPECT_THAT(outcome.text, HasSubstr("there is one problem")) << row.fault << outcome.text;
     }
-    EXPECT_EQ(Examine().code, 0) << "after all is mended";
+    Sql("update camera_profiles set source = 'https://cam/' where camera_id = 1")();
+    Sql("update cameras set insecure = 1")();
+    const Outcome noted = Examine();
+    EXPECT_EQ(noted.code, 0) << "after all is mended" << noted.text;
+    EXPECT_THAT(noted.text, HasSubstr("note     cameras\n         the HTTPS certificate of camera 1 is not verified"));
 }
 
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {

@@ -10,6 +10,8 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sched.h>
+#include <sys/mount.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
@@ -83,6 +85,30 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     ASSERT_TRUE(archive::ReadRecordingLog(footage_.Mount() / "1", kNoon + 100, log));
     EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "what is gone is not said to be there";
     EXPECT_EQ(std::count(log.begin() + 60, log.end(), 0), 0);
+}
+
+TEST_F(RetentionTest, TheOldestGoWhereNoFileCouldBeMade) {
+    const char* const mount = footage_.Mount().c_str();
+    if (::unshare(CLONE_NEWNS) != 0 || ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+        ::mount("tmpfs", mount, "tmpfs", 0, "size=1g,nr_inodes=500") != 0) {
+        GTEST_SKIP() << "only root can make a file system of few files";
+    }
+    const MountMark mark = MarkOf(footage_.Records(), footage_.MountId());
+    MountFolder::WriteMarker(footage_.Mount(), mark);
+    footage_.Record(1, kNoon, 60);
+    const int second = footage_.Record(1, kNoon + 60, 60);
+    const auto space = [&] { return MountFolder::Open(footage_.Mount(), mark)->Space(); };
+    EXPECT_EQ(Run(0).events, 0);
+    while (space().free_files > 3 * space().ReserveFiles() - 2) {
+        std::ofstream(footage_.Mount() / std::to_string(space().free_files));
+    }
+    EXPECT_EQ(Run(0).events, 0) << "between the limits";
+    while (space().free_files > 2 * space().ReserveFiles() - 1) {
+        std::ofstream(footage_.Mount() / std::to_string(space().free_files));
+    }
+    EXPECT_EQ(Run(0).events, 2) << "as many as there are";
+    EXPECT_THAT(Left(), IsEmpty()) << second;
+    ::umount2(mount, MNT_DETACH);
 }
 
 TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {

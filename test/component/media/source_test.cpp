@@ -55,7 +55,7 @@ TEST(Timeline, FollowsTheSourceAndSurvivesItsJumps) {
 TEST(Probe, FindsAPictureOnlyWithTheRightLogin) {
     MjpegCamera camera("viewer:se/cr@t");
     const auto probe = [&](const char* password) {
-        return ProbeSource(CameraKinds(), camera.Url(), {"viewer", password}, std::chrono::seconds(5));
+        return ProbeSource(CameraKinds(), camera.Url(), {{"viewer", password}});
     };
     EXPECT_EQ(probe("se/cr@t").video.height, 48);
     EXPECT_THROW(probe("wrong"), SourceError);
@@ -74,7 +74,7 @@ TEST(Probe, IgnoresSoundWhoseNameDoesNotDetermineItsForm) {
         const std::string command =
             "ffmpeg -v error -y -f lavfi -i testsrc=s=64x48:d=2 -f lavfi -i sine=d=2 -c:v libx264 -c:a ";
         ASSERT_EQ(std::system((command + row.sound + " " + path).c_str()), 0);
-        const ProbeResult result = ProbeSource(CameraKinds(), "file:" + path, {}, std::chrono::seconds(5));
+        const ProbeResult result = ProbeSource(CameraKinds(), "file:" + path, {});
         EXPECT_EQ(result.video.codec, Codec::kH264);
         EXPECT_EQ(result.audio ? std::optional(result.audio->codec) : std::nullopt, row.codec);
     }

@@ -28,6 +28,7 @@ TEST_P(CameraTest, RecordsComeBackAsTheyWerePut) {
             .live_profile = 2,
             .ptz = true,
             .audio = true,
+            .insecure = true,
             .profiles = {{0, "file:/tmp/a b'c.mkv", 1280, 720, 25}, {2, "https://[2001:db8::1]:8443/x", 0, 0, 0}}};
         camera.id = cameras_.Add(camera);
         EXPECT_EQ(cameras_.Find(camera.id), camera);

@@ -58,7 +58,7 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
           "insert into cameras (id, name, enabled, video_type, live_profile, ptz, audio)"
           " values (4, 'Gate', 1, 3, 0, 0, 1)",
           "insert into camera_profiles (camera_id, number, source, width, height, fps)"
-          " values (4, 0, 'test:h264', 0, 0, 0)",
+          " values (4, 0, 'test:h264', 0, 0, 0), (4, 1, 'https://cam/', 0, 0, 0)",
           "insert into denied_cameras (user_id, camera_id, access) values (1, 4, 2)",
           "update counters set value = 4 where name = 'camera'"}) {
         Force(statement);
@@ -66,6 +66,7 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
     EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
     Store store = Store::Open(url_);
     EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
+    EXPECT_TRUE(Cameras(store).Find(4)->insecure) << "it was recorded with any certificate";
     EXPECT_EQ(Cameras(store).Add(*Cameras(store).Find(4)), 5);
     EXPECT_THAT(Users(store).DeniedCameras(1, CameraAccess::kPlayback), ElementsAre(4));
     EXPECT_EQ(RecordingPlans(store).Find(4).mode, RecordMode::kNever);

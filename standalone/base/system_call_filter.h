@@ -1,0 +1,47 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Takes system calls away from a process: all but those that are named, or those that are named.
+//
+// Why so        A refused call fails with ENOSYS, as on an old kernel, so that the C library takes another way where it knows
+//               one. libseccomp knows the calls' numbers on each architecture, and leaves out what one lacks.
+#pragma once
+
+#include <initializer_list>
+#include <memory>
+#include <vector>
+
+#include <linux/filter.h>
+#include <seccomp.h>
+
+namespace lookhaven::base {
+
+// The lower 32 bits of an argument, masked, have that value.
+struct ArgumentIs {
+    unsigned argument;
+    int value;
+    int mask = ~0;
+};
+
+class SystemCallFilter {
+  public:
+    enum class Others { kRefused, kAllowed };
+
+    // Without exceptions, all calls are refused, or allowed. These throw std::system_error or std::bad_alloc.
+    explicit SystemCallFilter(Others others);
+    // The calls, which SCMP_SYS names, are an exception from that; with conditions, when all of them hold. A call may be
+    // named several times.
+    void Except(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions = {});
+
+    // For Apply in many processes.
+    std::vector<sock_filter> Program() const;
+
+  private:
+    std::unique_ptr<void, decltype(&::seccomp_release)> filter_;
+    const unsigned exception_;
+};
+
+// Filters the calls of this thread and of what it starts, for good; takes about 50 µs. False when this kernel, or what
+// emulates it, has no filters. Throws std::system_error.
+bool Apply(const std::vector<sock_filter>& program);
+
+}  // namespace lookhaven::base
