@@ -31,7 +31,11 @@ void WritePlayerFile(const std::string& path) {
 void CheckPlayerFile(const std::string& path) {
     pid_t owner = 0;
     std::ifstream(path) >> owner;
-    (owner == getpid() ? g_check : g_stop) = owner != getpid();
+    if (owner == getpid()) {
+        g_check = 0;
+    } else {
+        g_stop = 1;
+    }
 }
 
 }  // namespace
