@@ -7,6 +7,7 @@
 #include <ctime>
 
 #include <linux/futex.h>
+#include <linux/time_types.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -27,8 +28,8 @@ bool SleepWhileBoth(const SeenWord& first, const SeenWord& second, std::chrono::
     };
     const std::array<futex_waitv, 2> waiters{waiter(first), waiter(second)};
     const std::int64_t until_micros = MonotonicMicros() + timeout.count();
-    const timespec until{static_cast<time_t>(until_micros / 1'000'000),
-                         static_cast<long>(until_micros % 1'000'000 * 1000)};
+    // Of 64 bits on every machine, unlike timespec.
+    const __kernel_timespec until{until_micros / 1'000'000, until_micros % 1'000'000 * 1000};
     return syscall(SYS_futex_waitv, waiters.data(), waiters.size(), 0, &until, CLOCK_MONOTONIC) >= 0 ||
            errno == EAGAIN || errno == ETIMEDOUT;
 }

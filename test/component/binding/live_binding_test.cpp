@@ -8,6 +8,7 @@
 
 #include "platform/live/commoncfg.h"
 #include "platform/live/livestream.h"
+#include "standalone/base/clock.h"
 #include "standalone/control/common_config.h"
 #include "standalone/ring/writer.h"
 #include "standalone/store/cameras.h"
@@ -64,7 +65,7 @@ TEST_F(LiveBinding, AReaderEndsWithItsRing) {
         const std::vector<unsigned char> picture(1000);
         auto writer = std::make_unique<ring::Writer>(
             home_, ring::StreamId{1, 0}, ring::StreamFormat{"MJPEG", {}, 8, 8, true}, ring::Geometry{64, 1 << 16});
-        writer->Write({.data = picture, .is_key = true});
+        writer->Write({.data = picture, .is_key = true, .capture_millis = base::WallMillis()});
         ShmStreamFifo* const ring = LiveStreamFifoAt(1, 0);
         ASSERT_NE(ring, nullptr);
         __tag_DATA_ENTRY_INFO position;
