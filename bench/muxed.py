@@ -37,7 +37,7 @@ def main():
     bin_folder = pathlib.Path(sys.argv[1])
     print_comparison(bin_folder, Load("H264", 20_000, 25, viewers=(1, 10, 50)))
     print()
-    if (ROOT / "client/dist/index.html").exists() and (ROOT / "test/system/node_modules").exists():
+    if (ROOT / "client/dist/index.html").exists() and (ROOT / "test/node_modules").exists():
         print_canvas_delays(bin_folder.parent)
     else:
         print("No delay in Chromium: script/build and script/test fetch and build what it needs.")

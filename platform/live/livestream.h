@@ -48,11 +48,14 @@ class LH_PLATFORM_API ShmStreamFifo {
     // The newest entry whatever was read before, or null when the ring is empty.
     DataEntry* ReadLatest();
     // The newest entry if its number differs from lastSeq (numbers wrap, so "newer" is not compared), else null. May
-    // wait up to 100 ms for one; a signal ends the wait.
+    // wait up to 100 ms for one, and before that as long for the client's connection to drain: null, too, while it has
+    // not. A signal ends the wait.
     DataEntry* ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position);
     // The entry after lastSeq, or null when that is the newest; the newest key frame, or the newest audio entry, when
     // lastSeq has been overwritten or names no entry. Of video it may wait up to 100 ms while neither it nor the audio
-    // ring that is read beside it holds anything unread; a signal ends the wait.
+    // ring that is read beside it holds anything unread; a signal ends the wait. Of video it is null, too, while the
+    // client's connection has not drained; and once the next frame is more than two seconds old, frames are skipped up to
+    // the first key frame that is not.
     DataEntry* ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position);
     // The newest key frame, or null.
     DataEntry* ReadLatestIFrame();

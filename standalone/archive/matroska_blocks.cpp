@@ -280,8 +280,7 @@ bool MatroskaBlocks::SkipDamage() {
     // What looks like a cluster may lie within a frame; a file made for it could hold one in every fourth byte.
     constexpr int kMaxAttempts = 1000;
     const std::uint64_t size = FileSize();
-    int attempts = 0;
-    for (std::uint64_t at = position_ + 1; at < size && attempts < kMaxAttempts;) {
+    for (std::uint64_t at = position_ + 1; at < size && attempts_ < kMaxAttempts;) {
         const std::span<const std::uint8_t> bytes = Bytes(at, kStepBytes);
         const auto found = std::ranges::search(bytes, kClusterId);
         if (found.empty()) {
@@ -289,10 +288,10 @@ bool MatroskaBlocks::SkipDamage() {
             continue;
         }
         at += static_cast<std::uint64_t>(found.begin() - bytes.begin());
-        ++attempts;
-        std::vector<FrameEntry> ignored;
+        ++attempts_;
+        std::vector<FrameEntry> frames;
         const std::optional<Element> cluster = ReadElement(at, size);
-        if (cluster && ReadFrames(*cluster, ignored)) {
+        if (cluster && ReadFrames(*cluster, frames) && !frames.empty()) {
             position_ = at;
             return true;
         }

@@ -33,7 +33,8 @@ class MatroskaBlocks {
     // std::system_error.
     bool ReadCluster(std::vector<FrameEntry>& frames);
 
-    // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none. Throws
+    // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none, or
+    // after a thousand attempts for the whole file. Throws
     // std::system_error.
     bool SkipDamage();
 
@@ -60,6 +61,7 @@ class MatroskaBlocks {
     int file_;
     IndexHeader header_;
     std::uint64_t position_ = 0;
+    int attempts_ = 0;  // of SkipDamage to read what looks like a cluster
     std::uint64_t timestamp_scale_ns_ = 1'000'000;
     std::uint64_t video_track_ = 0;
     std::vector<std::uint8_t> window_;  // a piece of the file, read last

@@ -64,8 +64,7 @@ std::optional<Request> RequestFor(const TcpConnection& connection) {
 
 SendQueue::SendQueue(int socket, TcpConnection connection)
     : socket_(socket),
-      connection_(std::move(connection)),
-      netlink_(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_SOCK_DIAG)) {}
+      connection_(std::move(connection)) {}
 
 std::int64_t SendQueue::WaitingBytes() const {
     int bytes = 0;
@@ -73,8 +72,12 @@ std::int64_t SendQueue::WaitingBytes() const {
 }
 
 // The kernel answers within the call that asks.
-std::optional<SendQueue::Tcp> SendQueue::AskTcp() const {
+std::optional<SendQueue::Tcp> SendQueue::AskTcp() {
     const std::optional<Request> request = RequestFor(connection_);
+    // Only streams ask; a process that decodes pictures must not have this socket.
+    if (!std::exchange(has_opened_netlink_, true)) {
+        netlink_.Reset(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_SOCK_DIAG));
+    }
     alignas(nlmsghdr) std::array<char, 1024> answer{};
     if (!request || !netlink_ || ::send(netlink_.Get(), &*request, sizeof *request, 0) < 0) {
         return std::nullopt;

@@ -45,12 +45,13 @@ class LH_PLATFORM_API SendQueue {
 
     bool IsShortNow(std::int64_t now_us);
     std::int64_t WaitingBytes() const;
-    std::optional<Tcp> AskTcp() const;
+    std::optional<Tcp> AskTcp();
     void Measure(const Tcp& tcp, std::int64_t now_us);
 
     int socket_;
     TcpConnection connection_;
     base::FileDescriptor netlink_;
+    bool has_opened_netlink_ = false;
     std::int64_t measured_us_ = 0;     // when the present interval began …
     std::int64_t measured_bytes_ = 0;  // … and what the viewer had taken by then
     std::int64_t last_bytes_ = 0;      // taken within 100 ms, in the last interval …

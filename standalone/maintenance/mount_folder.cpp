@@ -112,7 +112,7 @@ std::int64_t MountSpace::ReserveFiles() const {
 }
 
 void MountFolder::WriteMarker(const std::filesystem::path& folder, const MountMark& mark) {
-    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mark), 0644);
+    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mark), 0600);
 }
 
 std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, const MountMark& mark) {

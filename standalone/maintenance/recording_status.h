@@ -22,8 +22,8 @@ enum class RecordingState {
     kRecording,  // frames go to the disk
     kDiskFull,   // paused until retention or the operator has made room
     kDiskFails,  // paused: writing to the mount fails
-    kMountGone,  // paused: the mount's folder is missing or lacks its marker
-    kNoMount,    // there is no mount to record to: lookhaven mount add
+    kMountGone,  // paused: the mount's folder is missing, or has no marker or another's
+    kNoMount,    // there is no mount to record to, or another recorder uses it
     kNoEventId,  // paused: no event ids are left, because the store has been unavailable for long
 };
 

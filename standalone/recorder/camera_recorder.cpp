@@ -18,6 +18,9 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kTryAgainUs = 1'000'000;
+// Events that begin for a camera's times alone: so many at once, and then one in each interval.
+constexpr std::int64_t kCutsAtOnce = 8;
+constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxDistanceUs = 30'000'000;  // of pictures; more is a camera that was away
 // Split here even where no key frame comes or the next event has no number.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
@@ -130,12 +133,23 @@ bool CameraRecorder::MustEndBefore(const Frame& frame) {
     if (frame.medium != base::Medium::kVideo || !frame.key_frame) {
         return false;
     }
-    if (has_gap_ || frame.timestamp_us < newest_us_) {
+    if ((has_gap_ || frame.timestamp_us < newest_us_) && MayCutByTimes()) {
         return true;
     }
     const std::int64_t drift_ms = WallOf(frame.timestamp_us) - (start.wall_ms + length_us / 1000);
     return IsOverdue(length_us) || std::abs(drift_ms) > kClockStepMs || start.mount_id != request_.plan.mount_id ||
            start.reason != Reason();
+}
+
+// A camera decides its own times, and each event costs what cameras share: a file, a row, a number.
+bool CameraRecorder::MayCutByTimes() {
+    const std::int64_t now_us = context_.monotonic_us();
+    cuts_paid_until_us_ = std::max(cuts_paid_until_us_, now_us - kCutsAtOnce * kCutIntervalUs);
+    if (cuts_paid_until_us_ + kCutIntervalUs > now_us) {
+        return false;
+    }
+    cuts_paid_until_us_ += kCutIntervalUs;
+    return true;
 }
 
 // As long as the store has given out no number for the next event, this one goes on.

@@ -13,6 +13,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <limits>
 #include <optional>
 #include <string>
 
@@ -68,6 +69,7 @@ class CameraRecorder {
     std::int64_t DistanceAfter(const Frame& frame);
     bool MustEndBefore(const Frame& frame);
     bool IsAfterGap(const Frame& frame) const;
+    bool MayCutByTimes();
     void Write(const Frame& frame);
     bool IsOverdue(std::int64_t length_us) const;
     void Begin();
@@ -88,6 +90,7 @@ class CameraRecorder {
     std::int64_t previous_us_ = 0;  // capture time of the picture before
     std::int64_t distance_us_ = 0;  // of pictures, smoothed
     bool has_gap_ = false;          // in the open event, which ends before the next key frame
+    std::int64_t cuts_paid_until_us_ = std::numeric_limits<std::int64_t>::min() / 2;
     std::int64_t last_flush_us_ = 0;
     std::int64_t next_mount_check_us_ = 0;
     std::int64_t try_again_us_ = 0;

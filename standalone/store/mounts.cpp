@@ -22,6 +22,7 @@ namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr int kRowsAtOnce = 10'000;
+constexpr int kMaxReservedEvent = 1 << 30;
 
 std::vector<Mount> FetchMounts(soci::session& sql) {
     return FetchAll<Mount>(sql, "order by id");
@@ -133,6 +134,8 @@ void Mounts::Remove(int id, bool forget_events) {
 }
 
 void Mounts::ReserveIds(int camera, int event) {
+    // Else one file name could leave no numbers for this installation's own events.
+    event = event > kMaxReservedEvent ? 0 : event;
     connection_.Write([&](soci::session& sql) {
         for (const auto& [counter, id] : {std::pair("camera", camera), std::pair("event", event)}) {
             Execute(sql, "update counters set value = :id where name = :name and value < :at_least", id,

@@ -138,7 +138,7 @@ constexpr const char* kDisks[] = {
     "insert into recorder_lease (count, holder, first_own_id) values (0, '', 2147483647)",
 };
 
-// Certificates were not verified until then: cameras that were recorded so stay recorded.
+// Before this version certificates were not verified: existing HTTPS cameras keep working, marked insecure.
 constexpr const char* kVerifiedCameras[] = {
     "alter table cameras add column insecure integer not null default 0",
     "update cameras set insecure = 1 where id in (select camera_id from camera_profiles where source like 'https:%')",
