@@ -74,40 +74,54 @@ bool IsWayFree() {
     return queue == nullptr || queue->IsShort();
 }
 
-// Waits, no longer than the ring itself does, until what was sent before has left; false when it has not, or a signal came.
-bool AwaitFreeWay() {
+// Waits until what was sent before has left. The milliseconds that are left of a ring's longest wait; nothing when it has not
+// left, or a signal came.
+std::optional<int> AwaitFreeWay() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = MonotonicMicros() + ring::kMaxWaitMillis * 1000;
     while (!IsWayFree()) {
         if (MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
-            return false;
+            return std::nullopt;
         }
     }
-    return true;
+    return static_cast<int>((until_us - MonotonicMicros()) / 1000);
 }
 
 bool IsBehind(const ring::Entry& entry) {
     return base::WallMillis() - entry.CaptureMillis() > kMaxBehindMs;
 }
 
-// The next entry, or, once that is too old, the first key frame that is not.
+// How the muxed stream of this process stands.
+struct Lag {
+    bool has_begun = false;     // the group of pictures that it began with is over, or was caught up with
+    bool is_held_back = false;  // a slow way kept it from the newest frame
+    bool is_skipping = false;
+} g_lag;
+
+// Whether the entry is left out: where a slow way has made a stream late it goes on at the first key frame that is not. The group
+// that a stream begins with is sent whatever its age.
+bool IsSkipped(const ring::Entry& entry) {
+    const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
+    const bool is_behind = IsBehind(entry);
+    g_lag.has_begun = g_lag.has_begun || is_key || !is_behind;
+    g_lag.is_held_back = g_lag.is_held_back && is_behind;
+    g_lag.is_skipping = (g_lag.is_skipping && !(is_key && !is_behind)) || (g_lag.is_held_back && g_lag.has_begun);
+    return g_lag.is_skipping;
+}
+
 const ring::Entry* ReadNextVideo(void* stream, int last_sequence, ring::Position* position) {
-    static bool is_skipping = false;
-    for (;;) {
-        const ring::Entry* entry = g_sound.position != nullptr
-                                       ? ring::ReadNext(stream, last_sequence, position, g_sound)
-                                       : ring::ReadNext(stream, last_sequence, position);
-        is_skipping = is_skipping || (entry != nullptr && IsBehind(*entry));
-        if (entry == nullptr || !is_skipping) {
-            return entry;
-        }
-        if ((entry->flags & ring::kKeyFrame) != 0 && !IsBehind(*entry)) {
-            is_skipping = false;
-            return entry;
-        }
+    if (!IsWayFree()) {
+        g_lag.is_held_back = true;
+        return nullptr;
+    }
+    const ring::Entry* entry = g_sound.position != nullptr ? ring::ReadNext(stream, last_sequence, position, g_sound)
+                                                           : ring::ReadNext(stream, last_sequence, position);
+    while (entry != nullptr && IsSkipped(*entry)) {
         last_sequence = entry->sequence;
         ring::ReadFinish(stream, entry, position);
+        entry = ring::ReadNext(stream, last_sequence, position);
     }
+    return entry;
 }
 
 void CopyExtraData(const void* stream, unsigned char* data, int& length) {
@@ -199,7 +213,8 @@ DataEntry* ShmStreamFifo::ReadLatest() {
 
 DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    return Held(AwaitFreeWay() ? ring::ReadLatest(this, lastSeq, Inner(position)) : nullptr);
+    const std::optional<int> left_millis = AwaitFreeWay();
+    return Held(left_millis ? ring::ReadLatest(this, lastSeq, Inner(position), *left_millis) : nullptr);
 }
 
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
@@ -207,7 +222,7 @@ DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position)
     if (ring::MediumOf(this) != base::Medium::kVideo) {
         return Held(ring::ReadNext(this, lastSeq, Inner(position)));
     }
-    return Held(IsWayFree() ? ReadNextVideo(this, lastSeq, Inner(position)) : nullptr);
+    return Held(ReadNextVideo(this, lastSeq, Inner(position)));
 }
 
 DataEntry* ShmStreamFifo::ReadLatestIFrame() {

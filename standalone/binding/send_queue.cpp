@@ -26,6 +26,7 @@ namespace {
 constexpr std::int64_t kShortBytes = 32 * 1024;
 constexpr std::int64_t kIntervalUs = 100'000;
 constexpr std::int64_t kMaxWaitUs = 10'000'000;
+constexpr std::int64_t kMaxRoundTripUs = 500'000;
 constexpr int kKeepsUp = 16;
 
 struct Request {
@@ -62,9 +63,7 @@ std::optional<Request> RequestFor(const TcpConnection& connection) {
 
 }  // namespace
 
-SendQueue::SendQueue(int socket, TcpConnection connection)
-    : socket_(socket),
-      connection_(std::move(connection)) {}
+SendQueue::SendQueue(int socket, TcpConnection connection) : socket_(socket), connection_(std::move(connection)) {}
 
 std::int64_t SendQueue::WaitingBytes() const {
     int bytes = 0;
@@ -88,7 +87,7 @@ std::optional<SendQueue::Tcp> SendQueue::AskTcp() {
         return std::nullopt;
     }
     const auto* message = reinterpret_cast<const inet_diag_msg*>(answer.data() + NLMSG_HDRLEN);
-    Tcp tcp{message->idiag_wqueue, 0};
+    Tcp tcp{message->idiag_wqueue, 0, 0};
     constexpr std::size_t kAttributes = NLMSG_HDRLEN + NLMSG_ALIGN(sizeof(inet_diag_msg));
     for (std::size_t at = kAttributes; at + sizeof(rtattr) <= static_cast<std::size_t>(size);) {
         rtattr attribute{};
@@ -101,6 +100,7 @@ std::optional<SendQueue::Tcp> SendQueue::AskTcp() {
             std::memcpy(&info, answer.data() + at + RTA_LENGTH(0),
                         std::min<std::size_t>(sizeof info, attribute.rta_len - RTA_LENGTH(0)));
             tcp.taken_bytes = static_cast<std::int64_t>(info.tcpi_bytes_acked);
+            tcp.round_trip_us = info.tcpi_min_rtt == ~0U ? 0 : info.tcpi_min_rtt;
         }
         at += RTA_ALIGN(attribute.rta_len);
     }
@@ -128,9 +128,11 @@ bool SendQueue::IsShortNow(std::int64_t now_us) {
     if (const std::optional<Tcp> tcp = AskTcp()) {
         Measure(*tcp, now_us);
         waiting_bytes += tcp->waiting_bytes;
+        round_trip_us_ = std::min<std::int64_t>(tcp->round_trip_us, kMaxRoundTripUs);
     }
     // The buffers of a slow viewer's machine may take a lot at once: one interval says little.
-    return waiting_bytes <= std::max(kShortBytes, std::min(last_bytes_, bytes_before_));
+    const std::int64_t taken_bytes = std::min(last_bytes_, bytes_before_);
+    return waiting_bytes <= std::max(kShortBytes, taken_bytes * (kIntervalUs + round_trip_us_) / kIntervalUs);
 }
 
 bool SendQueue::IsShort() {

@@ -41,6 +41,7 @@ class LH_PLATFORM_API SendQueue {
     struct Tcp {
         std::int64_t waiting_bytes = 0;
         std::int64_t taken_bytes = 0;  // by the viewer, since the connection began
+        std::int64_t round_trip_us = 0;
     };
 
     bool IsShortNow(std::int64_t now_us);
@@ -56,6 +57,7 @@ class LH_PLATFORM_API SendQueue {
     std::int64_t measured_bytes_ = 0;  // … and what the viewer had taken by then
     std::int64_t last_bytes_ = 0;      // taken within 100 ms, in the last interval …
     std::int64_t bytes_before_ = 0;    // … and in the one before
+    std::int64_t round_trip_us_ = 0;   // the shortest: what is under way on a long line does not wait
     std::optional<std::int64_t> long_since_us_;
     int short_in_a_row_ = 0;
     std::int64_t asked_us_ = 0;

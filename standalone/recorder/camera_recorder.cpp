@@ -133,7 +133,7 @@ bool CameraRecorder::MustEndBefore(const Frame& frame) {
     if (frame.medium != base::Medium::kVideo || !frame.key_frame) {
         return false;
     }
-    if ((has_gap_ || frame.timestamp_us < newest_us_) && MayCutByTimes()) {
+    if ((has_gap_ || frame.timestamp_us < newest_us_) && context_.rows.HasId() && MayCutByTimes()) {
         return true;
     }
     const std::int64_t drift_ms = WallOf(frame.timestamp_us) - (start.wall_ms + length_us / 1000);

@@ -2,6 +2,7 @@
 #include "standalone/recorder/mount_maintenance.h"
 
 #include <algorithm>
+#include <system_error>
 #include <utility>
 
 #include "standalone/base/clock.h"
@@ -41,7 +42,8 @@ maintenance::MountStatus MountMaintenance::Status() const {
 
 void MountMaintenance::Work(store::Store& store) {
     const std::int64_t now_us = base::MonotonicMicros();
-    const bool is_clock_trusted = clock_watch_.IsTrusted(now_us, base::WallSeconds());
+    const std::int64_t now_s = base::WallSeconds();
+    const Clock clock{now_s, clock_watch_.IsTrusted(now_us, now_s)};
     // Without numbers of its own the recorder could not tell its events from those of another one.
     if (!context_.first_own_id()) {
         is_recovered_ = false;
@@ -53,7 +55,7 @@ void MountMaintenance::Work(store::Store& store) {
     try {
         const std::optional<store::Mount> mount = store::Mounts(store).Find(mount_id_);
         if (mount) {
-            Maintain(store, *mount, is_clock_trusted);
+            Maintain(store, *mount, clock);
         }
         after_failure_ = {};
     } catch (const store::StoreError&) {
@@ -64,7 +66,7 @@ void MountMaintenance::Work(store::Store& store) {
     }
 }
 
-void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, bool is_clock_trusted) {
+void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, const Clock& clock) {
     if (!maintenance::OpenMount(store, mount)) {
         SetStatus(MountState::kNotMounted, mount.path);
         is_recovered_ = false;  // whatever is mounted later
@@ -78,21 +80,29 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const std::int64_t now_us = base::MonotonicMicros();
     if (!is_recovered_ && now_us >= after_recovery_.until_us) {
         after_recovery_.Begin(now_us);
-        is_recovered_ = maintenance::Recover(store, mount, context_.first_own_id().value_or(0), base::WallSeconds());
+        try {
+            recovery_failure_.clear();
+            is_recovered_ = maintenance::Recover(store, mount, context_.first_own_id().value_or(0), clock.now_s);
+        } catch (const std::system_error& error) {
+            recovery_failure_ = error.what();  // one folder that cannot be read must not stop retention
+        }
+        if (is_recovered_) {
+            after_recovery_ = {};
+        }
     }
-    maintenance::CompleteMarks(store, mount.id, base::WallSeconds(), context_.has_ended);
+    maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.has_ended);
     const int space_requests = context_.space_requests;
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
         const maintenance::RetentionResult deleted = maintenance::EnforceRetention(
-            store, mount, base::WallSeconds(),
-            is_clock_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits);
+            store, mount, clock.now_s,
+            clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits);
         if (deleted.events > 0) {
             base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
                           " old events");
         }
     }
-    SetStatus(MountState::kReady, "");
+    SetStatus(recovery_failure_.empty() ? MountState::kReady : MountState::kFailing, recovery_failure_);
 }
 
 void MountMaintenance::SetStatus(MountState state, const std::string& reason) {

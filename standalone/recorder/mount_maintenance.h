@@ -55,11 +55,18 @@ class MountMaintenance {
         void Begin(std::int64_t now_us);
     };
 
+    // The wall clock, read once for all that a pass decides by it.
+    struct Clock {
+        std::int64_t now_s;
+        bool is_trusted;
+    };
+
     void Work(store::Store& store);
-    void Maintain(store::Store& store, const store::Mount& mount, bool is_clock_trusted);
+    void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
     const int mount_id_;
+    std::string recovery_failure_;  // of the last attempt; of the thread, as the rest but the status
     const MaintenanceContext context_;
 
     // Only the thread uses these.

@@ -30,7 +30,8 @@ bool RecorderRole::Hold(store::Store& store, int first_own_id) {
 
 bool RecorderRole::MayTake(const store::RecorderRole& role, std::int64_t now_us) {
     if (held_count_) {
-        return role.count == *held_count_;
+        // A store that lost its last second, as after a crash of its server, has an older count of ours.
+        return role.count == *held_count_ || (role.holder == name_ && role.count < *held_count_);
     }
     // Under our name it is an earlier process of ours, unless we have lost the role to it.
     if (role.holder.empty() || (role.holder == name_ && !was_held_)) {

@@ -180,6 +180,9 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
 
 // No row will come, neither from this recorder nor of what an earlier one left on a mount.
 bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
+    if (rows_.IsRefused() || !rows_.FirstOwnId()) {
+        return false;  // another recorder has the footage
+    }
     return (are_mounts_recovered_ || mark.start_s > started_s_) && rows_.HasStored(mark.camera_id, mark.end_s);
 }
 
