@@ -282,12 +282,12 @@ bool MatroskaBlocks::SkipDamage() {
     const std::uint64_t size = FileSize();
     for (std::uint64_t at = position_ + 1; at < size && attempts_ < kMaxAttempts;) {
         const std::span<const std::uint8_t> bytes = Bytes(at, kStepBytes);
-        const auto found = std::ranges::search(bytes, kClusterId);
-        if (found.empty()) {
+        const auto found = std::search(bytes.begin(), bytes.end(), kClusterId.begin(), kClusterId.end());
+        if (found == bytes.end()) {
             at += std::max<std::size_t>(bytes.size(), kClusterId.size()) - (kClusterId.size() - 1);
             continue;
         }
-        at += static_cast<std::uint64_t>(found.begin() - bytes.begin());
+        at += static_cast<std::uint64_t>(found - bytes.begin());
         ++attempts_;
         std::vector<FrameEntry> frames;
         const std::optional<Element> cluster = ReadElement(at, size);
