@@ -12,8 +12,9 @@ namespace lookhaven::pattern {
 namespace {
 
 TEST(PatternSource, IsProbedLikeACamera) {
-    const media::ProbeResult result = media::ProbeSource(AllSourceKinds(), "test:h264?size=320x240&fps=10&audio=aac",
-                                                         {.credentials = {}, .no_data_limit = std::chrono::seconds(30)});
+    const media::ProbeResult result =
+        media::ProbeSource(AllSourceKinds(), "test:h264?size=320x240&fps=10&audio=aac",
+                           {.credentials = {}, .no_data_limit = std::chrono::seconds(30)});
     EXPECT_EQ(result.video.codec, base::Codec::kH264);
     EXPECT_EQ(result.video.width, 320);
     EXPECT_NEAR(result.frames_per_second, 10, 0.5);
