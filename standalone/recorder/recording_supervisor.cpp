@@ -60,13 +60,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
             continue;
         }
         if (!entries_.contains(camera)) {
-            Start("recording of camera " + std::to_string(camera), [&, camera = camera] {
-                const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis,
-                                              [this] { ++space_requests_; },
-                                              std::chrono::microseconds(no_data_limit_).count()};
-                auto worker = std::make_unique<RecordingWorker>(camera, context, flush_requests_);
-                entries_.emplace(camera, Entry{{camera, plan.stream}, std::move(worker)});
-            });
+            StartRecording({camera, plan.stream});
         }
         const auto entry = entries_.find(camera);
         if (entry == entries_.end() || entry->second.is_ending) {
@@ -85,6 +79,15 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     }
     ReconcileMounts(catalog);
     AnswerFlushes();
+}
+
+void RecordingSupervisor::StartRecording(const control::LiveStream& stream) {
+    Start("recording of camera " + std::to_string(stream.camera), [&] {
+        const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis, [this] { ++space_requests_; },
+                                      std::chrono::microseconds(no_data_limit_).count()};
+        entries_.emplace(stream.camera,
+                         Entry{stream, std::make_unique<RecordingWorker>(stream.camera, context, flush_requests_)});
+    });
 }
 
 void RecordingSupervisor::AnswerFlushes() {

@@ -44,6 +44,7 @@ class RecordingSupervisor {
     };
 
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
+    void StartRecording(const control::LiveStream& stream);
     void AnswerFlushes();
     void ReconcileMounts(const CatalogContents& catalog);
     bool FootageHasEnded(const store::Mark& mark) const;
