@@ -92,7 +92,10 @@ class Retention {
         for (const store::Event& event : going) {
             ++deleted_.events;
             deleted_.bytes += event.size_bytes;
-            ends_s[event.camera_id] = std::max(ends_s[event.camera_id], event.end_s);
+            // What a wrong clock dated ahead says nothing about the marks before it.
+            if (event.end_s <= now_s_) {
+                ends_s[event.camera_id] = std::max(ends_s[event.camera_id], event.end_s);
+            }
             ClearRecordingLog(event);
         }
         for (const auto& [camera, end_s] : ends_s) {
