@@ -14,7 +14,7 @@ class LH_PLATFORM_API SDKUser {
                                const std::string& remoteIp);
 };
 
-// True when cookie is the right answer to timestamp under the secret that this host shares with a peer. The module
+// True when cookie is the right answer to timestamp under the secret that this host shares with a paired host. The module
 // passes non-empty placeholders for missing values, which must not match.
 LH_PLATFORM_API bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp);
 

@@ -27,7 +27,7 @@ enum DOOR_PRIV_TYPE : int {
     DOOR_PRIV_VIEW = 1,
 };
 
-// The user id that stands for a peer admitted by pair matching. No account has it.
+// The user id that stands for a paired host admitted by pair matching. No account has it.
 constexpr unsigned int PAIR_AUTH_UID = 1024;
 
 // A value: copies are independent of each other.
@@ -60,7 +60,7 @@ class LH_PLATFORM_API PrivProfile {
     std::shared_ptr<const Data> m_pData;
 };
 
-// The user's profile, read from the store on each call. PAIR_AUTH_UID gives the profile of a peer, which denies
+// The user's profile, read from the store on each call. PAIR_AUTH_UID gives the profile of a paired host, which denies
 // nothing. For an unknown user the result's GetId() is 0.
 LH_PLATFORM_API PrivProfile PrivProfileGetByUid(unsigned int uid);
 

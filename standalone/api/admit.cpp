@@ -33,7 +33,6 @@ bool IsCrossSite(const http::Request& request) {
     return scheme_end == origin.npos || origin.substr(scheme_end + 3) != request.Header("HTTP_HOST");
 }
 
-constexpr int kRetryAfterSeconds = 1;
 constexpr std::chrono::milliseconds kSearchPoll{10};
 constexpr std::chrono::seconds kSearchWait{10};
 
@@ -42,9 +41,9 @@ void Occupy(control::SlotTable& slots, control::Slot& slot, int user, std::size_
     case control::Admission::kGranted:
         return;
     case control::Admission::kTooManyOfUser:
-        throw Failure(503, "too many requests of this account are running", kRetryAfterSeconds);
+        throw Failure(503, "too many requests of this account are running", http::kRetrySoonSeconds);
     case control::Admission::kTooMany:
-        throw Failure(503, "too many requests are running", kRetryAfterSeconds);
+        throw Failure(503, "too many requests are running", http::kRetrySoonSeconds);
     }
 }
 
@@ -52,7 +51,7 @@ void AwaitSearch(const Call& call, std::size_t max_of_user) {
     const auto until = std::chrono::steady_clock::now() + kSearchWait;
     while (!call.slots.BeginSearch(call.slot, max_of_user)) {
         if (std::chrono::steady_clock::now() > until) {
-            throw Failure(503, "too many searches of this account are running", kRetryAfterSeconds);
+            throw Failure(503, "too many searches of this account are running", http::kRetrySoonSeconds);
         }
         call.context.CloseRecords();
         std::this_thread::sleep_for(kSearchPoll);
@@ -65,12 +64,12 @@ const char* SessionCookie(const http::Request& request) {
     return request.Header("HTTPS") == "on" ? "__Host-id" : "id";
 }
 
-Load LoadOf(const Call& call) {
+CostClass CostClassOf(const Call& call) {
     if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || IsPlayer(call)) {
-        return Load::kPictures;
+        return CostClass::kPictures;
     }
     const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name;
-    return is_light ? Load::kLittle : Load::kSearch;
+    return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 
 std::optional<binding::Login> FindLogin(const Call& call) {
@@ -112,14 +111,14 @@ void Admit(const Call& call, const RequestLimits& limits) {
     call.context.SetSession(call.login->session_handle);
     control::SlotTable::SetSession(call.slot, call.login->session_handle);
     Occupy(call.slots, call.slot, static_cast<int>(call.login->user_id), limits.per_user,
-           call.login->is_manager ? std::numeric_limits<std::size_t>::max() : limits.but_managers);
-    if (LoadOf(call) == Load::kSearch) {
+           call.login->is_manager ? std::numeric_limits<std::size_t>::max() : limits.without_managers);
+    if (CostClassOf(call) == CostClass::kSearch) {
         AwaitSearch(call, limits.searches_per_user);
     }
 }
 
 void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
-    Occupy(slots, slot, store::kPairedHostUserId, limits.per_user, limits.but_managers);
+    Occupy(slots, slot, store::kPairedHostUserId, limits.per_user, limits.without_managers);
 }
 
 }  // namespace lookhaven::api

@@ -21,18 +21,18 @@ std::optional<binding::Login> FindLogin(const Call& call);
 
 // How many admitted requests run at once.
 struct RequestLimits {
-    std::size_t but_managers = 256;  // of all callers but managers
-    std::size_t per_user = 64;       // paired hosts are one user together
+    std::size_t without_managers = 256;  // of all callers but managers
+    std::size_t per_user = 64;           // paired hosts are one user together
     std::size_t searches_per_user = 4;
 };
 
 // What serving a call takes.
-enum class Load {
+enum class CostClass {
     kLittle,
     kPictures,  // the memory of rings and decoders; mostly waits for a camera
     kSearch,    // seconds of a processor, perhaps
 };
-Load LoadOf(const Call& call);
+CostClass CostClassOf(const Call& call);
 
 // Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure 401 without
 // a session, except at the API that authenticates its callers itself; 503 beyond a limit. Of the searches of a user,

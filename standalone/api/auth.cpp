@@ -20,7 +20,6 @@ namespace lookhaven::api {
 namespace {
 
 constexpr std::size_t kMaxHashing = 4;  // at once, in 64 MiB each
-constexpr int kRetryAfterSeconds = 1;
 
 // Whoever checks or hashes a password on request holds this meanwhile.
 class HashingPlace {
@@ -28,7 +27,7 @@ class HashingPlace {
     // Throws Failure 503 when there is none.
     explicit HashingPlace(const Call& call) : slot_(call.slot) {
         if (!call.slots.BeginHashing(slot_, kMaxHashing)) {
-            throw Failure(503, "too many log-ins at once; try again in a moment", kRetryAfterSeconds);
+            throw Failure(503, "too many log-ins at once; try again in a moment", http::kRetrySoonSeconds);
         }
     }
     ~HashingPlace() { control::SlotTable::EndWork(slot_); }

@@ -16,9 +16,8 @@
 
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
-#include "standalone/api/picture_filter.h"
+#include "standalone/api/decoder_sandbox.h"
 #include "standalone/base/log.h"
-#include "standalone/base/system_call_filter.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
@@ -59,7 +58,7 @@ std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
     try {
         const media::DecoderLibrary& decoder = media::LoadDecoderLibrary();
         call.context.CloseRecords();
-        base::Apply(FilterOfStills());
+        EnterDecoderSandbox(StillPictureFilter());
         return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());

@@ -23,7 +23,7 @@ constexpr std::chrono::milliseconds kSignalLimit{1'000};
 constexpr std::chrono::milliseconds kOpenLimit{1'000};
 
 // The player that the call is for. Throws Failure 400 without a stream key, 404 when there is no such player.
-control::SlotUse FindPlayer(const Call& call) {
+control::RequestRef FindPlayer(const Call& call) {
     const std::int64_t key = call.NumberOr("timestamp", 0);
     if (key < 1) {
         throw Failure(400, "timestamp must be the number that the player was started with");
@@ -36,7 +36,7 @@ control::SlotUse FindPlayer(const Call& call) {
 }
 
 // As SlotTable::ChangePause. Throws Failure 404 when the player has ended.
-void ChangePause(const control::SlotUse& use, const std::function<void(control::Pause&)>& change) {
+void ChangePause(const control::RequestRef& use, const std::function<void(control::Pause&)>& change) {
     if (!control::SlotTable::ChangePause(use, change)) {
         throw Failure(404, "the player has ended");
     }
@@ -66,8 +66,8 @@ bool IsOpen(const Call& call, const control::Player& player) {
 
 // As FindPlayer, but waits while the player opens its recording: what is asked of it before that would be lost. Throws
 // Failure 409 when that takes too long.
-control::SlotUse AwaitPlayer(const Call& call) {
-    const control::SlotUse use = FindPlayer(call);
+control::RequestRef AwaitPlayer(const Call& call) {
+    const control::RequestRef use = FindPlayer(call);
     const auto until = std::chrono::steady_clock::now() + kOpenLimit;
     while (!IsOpen(call, use.slot->player)) {
         if (use.IsOver()) {
@@ -84,7 +84,7 @@ control::SlotUse AwaitPlayer(const Call& call) {
 control::SharedLock LockPlayers(const Call& call) {
     control::SharedLock lock = call.slots.LockPlayers();
     if (!lock) {
-        throw Failure(503, "the player was not reached in time");
+        throw Failure(503, "the player was not reached in time", http::kRetrySoonSeconds);
     }
     return lock;
 }
@@ -95,7 +95,7 @@ std::string SetRate(const Call& call) {
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
     }
-    const control::SlotUse use = AwaitPlayer(call);
+    const control::RequestRef use = AwaitPlayer(call);
     const control::Player& player = use.slot->player;
     if (!player.takes_rate) {
         throw Failure(409, "this player does not take its rate from here");
@@ -126,19 +126,19 @@ std::string GetPosition(const Call& call) {
 }
 
 // Waits until the host has told the player of its pause.
-void AwaitPause(const Call& call, const control::SlotUse& use, bool on) {
+void AwaitPause(const Call& call, const control::RequestRef& use, bool on) {
     call.slots.Wake();
     const auto until = std::chrono::steady_clock::now() + kSignalLimit;
     while (use.slot->player.paused != on) {
         if (use.IsOver() || std::chrono::steady_clock::now() > until) {
-            throw Failure(503, "the player was not reached in time");
+            throw Failure(503, "the player was not reached in time", http::kRetrySoonSeconds);
         }
         std::this_thread::sleep_for(kPoll);
     }
 }
 
 // Changes the request, and the rate with it: a player that stands still has rate 1 at most.
-void RequestPause(const Call& call, const control::SlotUse& use, bool on) {
+void RequestPause(const Call& call, const control::RequestRef& use, bool on) {
     const control::SharedLock lock = LockPlayers(call);
     std::optional<control::ProgressFile> progress;
     if (use.slot->player.takes_rate) {
@@ -166,7 +166,7 @@ std::string Pause(const Call& call) {
         throw Failure(400, "on must be true or false");
     }
     const bool on = asked.asBool();
-    const control::SlotUse use = AwaitPlayer(call);
+    const control::RequestRef use = AwaitPlayer(call);
     if (!use.slot->player.can_pause) {
         throw Failure(409, "this player cannot be paused");
     }

@@ -14,7 +14,7 @@
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/remote/fetch.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/remote/pair_token.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::api {
@@ -75,7 +75,7 @@ std::string Play(const Call& call) {
     request.query = "api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=Play&client=REC_SERVER&camera=" + id +
                     Passed(call, "snapshot") + Passed(call, "profileType");
     request.cookie = "timestamp=" + timestamp;
-    request.form = "cookie=" + store::MakePairToken(secret, timestamp);
+    request.form = "cookie=" + remote::MakePairToken(secret, timestamp);
     if (!binding::MayUse(camera->id, store::CameraAccess::kAudio)) {
         request.form += "&privData=%7B%22deniedAudio%22%3A%5B" + id + "%5D%7D";
     }

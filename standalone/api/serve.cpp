@@ -12,10 +12,10 @@
 #include <sys/uio.h>
 #include <unistd.h>
 
+#include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/log.h"
-#include "standalone/base/system_call_filter.h"
 #include "standalone/binding/rights.h"
 #include "standalone/http/body.h"
 #include "standalone/store/servers.h"
@@ -148,7 +148,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     if (own == nullptr && entry == nullptr) {
         throw Failure(404, "no such api, version or method");
     }
-    if (LoadOf(call) == Load::kPictures) {
+    if (CostClassOf(call) == CostClass::kPictures) {
         LimitAddressSpace(kMaxAddressSpaceForPictures);
     }
     if (own == nullptr || own->needs_session) {
@@ -161,7 +161,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
         PreparePlayer(call);
     }
     if (IsPlayer(call)) {
-        base::Apply(service.player_filter);
+        EnterDecoderSandbox(service.playback_filter);
     }
     return RunModule(entry, call);
 }

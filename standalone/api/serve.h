@@ -19,7 +19,7 @@ struct Service {
     const base::Installation& installation;
     const Modules& modules;
     RequestLimits limits;
-    std::vector<sock_filter> player_filter;  // FilterOfPlayers(), made once for all
+    std::vector<sock_filter> playback_filter;  // PlaybackFilter(), made once for all
 };
 
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down for

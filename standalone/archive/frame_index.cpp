@@ -11,8 +11,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
 #include "standalone/base/video.h"

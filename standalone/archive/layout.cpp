@@ -6,7 +6,7 @@
 #include <cstdio>
 #include <ctime>
 
-#include "standalone/archive/file.h"
+#include "standalone/archive/mount_file.h"
 
 namespace lookhaven::archive {
 

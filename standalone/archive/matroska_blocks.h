@@ -9,12 +9,10 @@
 #pragma once
 
 #include <cstdint>
-#include <optional>
-#include <span>
-#include <string>
 #include <vector>
 
 #include "standalone/archive/archive_error.h"
+#include "standalone/archive/ebml_reader.h"
 #include "standalone/archive/frame_index.h"
 
 namespace lookhaven::archive {
@@ -34,38 +32,26 @@ class MatroskaBlocks {
     bool ReadCluster(std::vector<FrameEntry>& frames);
 
     // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none, or
-    // after a thousand attempts for the whole file. Throws
-    // std::system_error.
+    // after a thousand attempts for the whole file. Throws std::system_error.
     bool SkipDamage();
 
     // Where the last complete cluster ends, or what precedes the first.
     std::uint64_t Position() const { return position_; }
 
   private:
-    struct Element;
-
-    std::span<const std::uint8_t> Bytes(std::uint64_t at, std::size_t count);
-    std::optional<Element> ReadElementHead(std::uint64_t at);
-    std::optional<Element> ReadElement(std::uint64_t at, std::uint64_t end);
-    template <class Visit>
-    bool ForEachChild(const Element& parent, Visit visit);
-    std::uint64_t Unsigned(const Element& element);
-    std::string Text(const Element& element);
     void ReadHead();
-    void ReadInfo(const Element& info);
-    void ReadTrack(const Element& track);
-    bool ReadFrames(const Element& cluster, std::vector<FrameEntry>& frames);
-    bool ReadBlock(const Element& block, std::uint64_t cluster_time, bool simple, std::vector<FrameEntry>& frames);
-    std::uint64_t FileSize() const;
+    void ReadInfo(const EbmlReader::Element& info);
+    void ReadTrack(const EbmlReader::Element& track);
+    bool ReadFrames(const EbmlReader::Element& cluster, std::vector<FrameEntry>& frames);
+    bool ReadBlock(const EbmlReader::Element& block, std::uint64_t cluster_time, bool simple,
+                   std::vector<FrameEntry>& frames);
 
-    int file_;
+    EbmlReader ebml_;
     IndexHeader header_;
     std::uint64_t position_ = 0;
     int attempts_ = 0;  // of SkipDamage to read what looks like a cluster
     std::uint64_t timestamp_scale_ns_ = 1'000'000;
     std::uint64_t video_track_ = 0;
-    std::vector<std::uint8_t> window_;  // a piece of the file, read last
-    std::uint64_t window_at_ = 0;
 };
 
 }  // namespace lookhaven::archive

@@ -10,8 +10,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"

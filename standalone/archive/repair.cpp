@@ -9,9 +9,9 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
 #include "standalone/archive/matroska_blocks.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/base/file.h"
 #include "standalone/base/video.h"
 

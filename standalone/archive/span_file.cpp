@@ -6,8 +6,8 @@
 #include <optional>
 #include <string_view>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/layout.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {

@@ -28,16 +28,16 @@ void Check(int result) {
 
 }  // namespace
 
-SystemCallFilter::SystemCallFilter(Others others)
-    : filter_(::seccomp_init(others == Others::kAllowed ? SCMP_ACT_ALLOW : kRefusal), &::seccomp_release),
-      exception_(others == Others::kAllowed ? kRefusal : SCMP_ACT_ALLOW) {
+SystemCallFilter::SystemCallFilter(DefaultAction action)
+    : filter_(::seccomp_init(action == DefaultAction::kAllow ? SCMP_ACT_ALLOW : kRefusal), &::seccomp_release),
+      exception_(action == DefaultAction::kAllow ? kRefusal : SCMP_ACT_ALLOW) {
     if (!filter_) {
         throw std::bad_alloc();
     }
     Check(::seccomp_attr_set(filter_.get(), SCMP_FLTATR_ACT_BADARCH, SCMP_ACT_KILL_PROCESS));
 }
 
-void SystemCallFilter::Except(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions) {
+void SystemCallFilter::AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions) {
     std::vector<scmp_arg_cmp> compared;
     for (const auto& [argument, value, mask] : conditions) {
         compared.push_back(
@@ -64,7 +64,7 @@ std::vector<sock_filter> SystemCallFilter::Program() const {
     return program;
 }
 
-bool Apply(const std::vector<sock_filter>& program) {
+bool InstallSystemCallFilter(const std::vector<sock_filter>& program) {
     // A kernel that has filters looks for one at address 0.
     if (::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, nullptr, 0, 0) != 0 && errno != EFAULT) {
         return false;

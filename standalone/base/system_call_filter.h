@@ -24,15 +24,15 @@ struct ArgumentIs {
 
 class SystemCallFilter {
   public:
-    enum class Others { kRefused, kAllowed };
+    enum class DefaultAction { kRefuse, kAllow };
 
     // Without exceptions, all calls are refused, or allowed. These throw std::system_error or std::bad_alloc.
-    explicit SystemCallFilter(Others others);
+    explicit SystemCallFilter(DefaultAction action);
     // The calls, which SCMP_SYS names, are an exception from that; with conditions, when all of them hold. A call may be
     // named several times.
-    void Except(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions = {});
+    void AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions = {});
 
-    // For Apply in many processes.
+    // For InstallSystemCallFilter, in any number of processes.
     std::vector<sock_filter> Program() const;
 
   private:
@@ -42,6 +42,6 @@ class SystemCallFilter {
 
 // Filters the calls of this thread and of what it starts, for good; takes about 50 µs. False when this kernel, or what
 // emulates it, has no filters. Throws std::system_error.
-bool Apply(const std::vector<sock_filter>& program);
+[[nodiscard]] bool InstallSystemCallFilter(const std::vector<sock_filter>& program);
 
 }  // namespace lookhaven::base

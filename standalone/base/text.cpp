@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/text.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cstddef>
 
@@ -104,6 +105,12 @@ std::string ToHex(std::span<const unsigned char> bytes) {
     sodium_bin2hex(text.data(), text.size(), bytes.data(), bytes.size());
     text.pop_back();
     return text;
+}
+
+bool IsHex(std::string_view text, std::size_t digits) {
+    return text.size() == digits && std::all_of(text.begin(), text.end(), [](char c) {
+               return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f');
+           });
 }
 
 }  // namespace lookhaven::base

@@ -30,4 +30,7 @@ std::optional<std::string> FromBase64(std::string_view text);
 // Two digits each, 0 to 9 and a to f.
 std::string ToHex(std::span<const unsigned char> bytes);
 
+// Whether it is that many hexadecimal digits, in lower case.
+bool IsHex(std::string_view text, std::size_t digits);
+
 }  // namespace lookhaven::base

@@ -124,14 +124,8 @@ std::string Camera::GetStoragePath() const {
         if (!lookhaven::binding::MayUse(m_Id, store::CameraAccess::kPlayback)) {
             return {};
         }
-        RequestContext& context = RequestContext::Current();
-        const auto plan = context.Plans().find(m_Id);
-        const int planned = plan == context.Plans().end() ? 0 : plan->second.mount_id;
-        const auto mount = std::ranges::find_if(context.Mounts(), [planned](const store::Mount& each) {
-            return planned != 0 ? each.id == planned : each.is_default;
-        });
-        return mount == context.Mounts().end() ? std::filesystem::path()
-                                               : std::filesystem::path(mount->path) / std::to_string(m_Id);
+        const store::Mount* mount = RequestContext::Current().MountOf(m_Id);
+        return mount == nullptr ? std::filesystem::path() : std::filesystem::path(mount->path) / std::to_string(m_Id);
     });
 }
 

@@ -47,16 +47,13 @@ std::set<int> Without(std::set<int> ids, const std::set<int>& denied) {
     return ids;
 }
 
-// The cameras whose plan names the mount.
+// The cameras that are recorded to the mount; mount 0: to any.
 std::set<int> RecordingOn(const std::vector<store::Camera>& cameras, int mount_id) {
     RequestContext& context = RequestContext::Current();
-    const auto fallback = std::ranges::find_if(context.Mounts(), &store::Mount::is_default);
-    const int fallback_id = fallback == context.Mounts().end() ? 0 : fallback->id;
     std::set<int> ids;
     for (const store::Camera& camera : cameras) {
-        const auto plan = context.Plans().find(camera.id);
-        const int planned = plan == context.Plans().end() ? 0 : plan->second.mount_id;
-        if (mount_id == 0 || mount_id == (planned != 0 ? planned : fallback_id)) {
+        const store::Mount* mount = context.MountOf(camera.id);
+        if (mount_id == 0 || (mount != nullptr && mount->id == mount_id)) {
             ids.insert(camera.id);
         }
     }

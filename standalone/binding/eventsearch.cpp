@@ -14,7 +14,7 @@
 
 #include "standalone/archive/recording_log.h"
 #include "standalone/binding/event_record.h"
-#include "standalone/binding/large_pages.h"
+#include "standalone/binding/huge_pages.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/events.h"

@@ -48,8 +48,8 @@ constexpr std::int64_t kMaxAttachMicros = 5'000'000;
 constexpr long kAttachPollNanos = 10'000'000;
 
 // The sound that this process reads beside its picture; without a position until the module begins to read it.
-ring::Companion g_sound;
-// A muxed stream needs each frame, so it falls behind on a slow way; from here on it skips to a key frame.
+ring::SecondReader g_sound;
+// A muxed stream needs each frame, so it falls behind on a slow connection; from here on it skips to a key frame.
 constexpr std::int64_t kMaxBehindMs = 2'000;
 
 ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
@@ -69,17 +69,17 @@ void EndReaderOfRetired(const void* stream) {
     }
 }
 
-bool IsWayFree() {
+bool IsDrained() {
     binding::SendQueue* queue = RequestContext::Current().Queue();
-    return queue == nullptr || queue->IsShort();
+    return queue == nullptr || queue->IsDrained();
 }
 
 // Waits until what was sent before has left. The milliseconds that are left of a ring's longest wait; nothing when it has not
 // left, or a signal came.
-std::optional<int> AwaitFreeWay() {
+std::optional<int> AwaitDrained() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = MonotonicMicros() + ring::kMaxWaitMillis * 1000;
-    while (!IsWayFree()) {
+    while (!IsDrained()) {
         if (MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
             return std::nullopt;
         }
@@ -94,11 +94,11 @@ bool IsBehind(const ring::Entry& entry) {
 // How the muxed stream of this process stands.
 struct Lag {
     bool has_begun = false;     // the group of pictures that it began with is over, or was caught up with
-    bool is_held_back = false;  // a slow way kept it from the newest frame
+    bool is_held_back = false;  // a slow connection kept it from the newest frame
     bool is_skipping = false;
 } g_lag;
 
-// Whether the entry is left out: where a slow way has made a stream late it goes on at the first key frame that is not. The group
+// Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that is not. The group
 // that a stream begins with is sent whatever its age.
 bool IsSkipped(const ring::Entry& entry) {
     const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
@@ -110,7 +110,7 @@ bool IsSkipped(const ring::Entry& entry) {
 }
 
 const ring::Entry* ReadNextVideo(void* stream, int last_sequence, ring::Position* position) {
-    if (!IsWayFree()) {
+    if (!IsDrained()) {
         g_lag.is_held_back = true;
         return nullptr;
     }
@@ -213,7 +213,7 @@ DataEntry* ShmStreamFifo::ReadLatest() {
 
 DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    const std::optional<int> left_millis = AwaitFreeWay();
+    const std::optional<int> left_millis = AwaitDrained();
     return Held(left_millis ? ring::ReadLatest(this, lastSeq, Inner(position), *left_millis) : nullptr);
 }
 

@@ -40,7 +40,7 @@ void RequireKnownShape(const Json::Value& priv_data) {
 // The caller's account; nothing for one that was removed and for who has none.
 const std::optional<store::User>& CallersAccount() {
     RequestContext& context = RequestContext::Current();
-    std::optional<std::optional<store::User>>& known = context.Known().caller;
+    std::optional<std::optional<store::User>>& known = context.Cache().caller;
     if (!known) {
         known = store::Users(context.Records()).Find(static_cast<int>(context.Caller()));
     }
@@ -50,7 +50,7 @@ const std::optional<store::User>& CallersAccount() {
 // The cameras that the caller's account is denied.
 const std::set<int>& DeniedToAccount(store::CameraAccess kind) {
     RequestContext& context = RequestContext::Current();
-    std::map<store::CameraAccess, std::set<int>>& known = context.Known().denied_cameras;
+    std::map<store::CameraAccess, std::set<int>>& known = context.Cache().denied_cameras;
     const auto found = known.find(kind);
     return found != known.end()
                ? found->second

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/binding/request_context.h"
 
+#include <algorithm>
 #include <stdexcept>
 #include <string>
 
@@ -52,21 +53,29 @@ store::Store& RequestContext::Records() {
 }
 
 const std::vector<store::Mount>& RequestContext::Mounts() {
-    if (!known_.mounts) {
-        known_.mounts = store::Mounts(Records()).List();
+    if (!cache_.mounts) {
+        cache_.mounts = store::Mounts(Records()).List();
     }
-    return *known_.mounts;
+    return *cache_.mounts;
 }
 
 const std::map<int, store::RecordingPlan>& RequestContext::Plans() {
-    if (!known_.plans) {
-        known_.plans = store::RecordingPlans(Records()).List();
+    if (!cache_.plans) {
+        cache_.plans = store::RecordingPlans(Records()).List();
     }
-    return *known_.plans;
+    return *cache_.plans;
+}
+
+const store::Mount* RequestContext::MountOf(int camera_id) {
+    const auto plan = Plans().find(camera_id);
+    const int planned = plan == Plans().end() ? 0 : plan->second.mount_id;
+    const auto mount = std::ranges::find_if(
+        Mounts(), [planned](const store::Mount& each) { return planned != 0 ? each.id == planned : each.is_default; });
+    return mount == Mounts().end() ? nullptr : &*mount;
 }
 
 void RequestContext::CloseRecords() {
-    known_ = {};
+    cache_ = {};
     if (records_ != nullptr) {
         records_.reset();
         // What the store worked with is half of a viewer's own memory, and there may be hundreds of viewers.

@@ -53,7 +53,7 @@ struct Restrictions {
 };
 
 // What the store told about the caller and the mounts. A search asks for the same once for each of its cameras.
-struct KnownRecords {
+struct RecordCache {
     std::optional<std::optional<store::User>> caller;
     std::map<store::CameraAccess, std::set<int>> denied_cameras;  // to the caller
     std::optional<std::vector<store::Mount>> mounts;
@@ -82,9 +82,11 @@ class LH_PLATFORM_API RequestContext {
     // The record store, opened by the first call. Throws store::StoreError.
     store::Store& Records();
     // What this request has read; empty after CloseRecords and for another caller.
-    KnownRecords& Known() { return known_; }
+    RecordCache& Cache() { return cache_; }
     const std::vector<store::Mount>& Mounts();
     const std::map<int, store::RecordingPlan>& Plans();
+    // The mount that the camera is recorded to: its plan's, or the default one. Null when there is none.
+    const store::Mount* MountOf(int camera_id);
     // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever
     // is about to send or to wait calls this; references from Records are invalid afterwards.
     void CloseRecords();
@@ -93,7 +95,7 @@ class LH_PLATFORM_API RequestContext {
     unsigned int Caller() const { return caller_; }
     void SetCaller(unsigned int user_id) {
         caller_ = user_id;
-        known_ = {};
+        cache_ = {};
     }
     // The handle of the caller's session; empty when there is none.
     const std::string& Session() const { return session_; }
@@ -134,7 +136,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
-    KnownRecords known_;
+    RecordCache cache_;
     unsigned int caller_ = 0;
     std::string session_;
     Restrictions restrictions_;

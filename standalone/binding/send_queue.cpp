@@ -119,9 +119,9 @@ void SendQueue::Measure(const Tcp& tcp, std::int64_t now_us) {
 }
 
 // Of a viewer who keeps up the kernel is asked a few times a second: that costs as much as a tenth of sending a picture.
-bool SendQueue::IsShortNow(std::int64_t now_us) {
+bool SendQueue::IsDrainedNow(std::int64_t now_us) {
     std::int64_t waiting_bytes = WaitingBytes();
-    if (short_in_a_row_ >= kKeepsUp && now_us - asked_us_ < kIntervalUs) {
+    if (drained_in_a_row_ >= kKeepsUp && now_us - asked_us_ < kIntervalUs) {
         return waiting_bytes <= kShortBytes;
     }
     asked_us_ = now_us;
@@ -135,14 +135,14 @@ bool SendQueue::IsShortNow(std::int64_t now_us) {
     return waiting_bytes <= std::max(kShortBytes, taken_bytes * (kIntervalUs + round_trip_us_) / kIntervalUs);
 }
 
-bool SendQueue::IsShort() {
+bool SendQueue::IsDrained() {
     const std::int64_t now_us = base::MonotonicMicros();
-    if (IsShortNow(now_us)) {
-        ++short_in_a_row_;
+    if (IsDrainedNow(now_us)) {
+        ++drained_in_a_row_;
         long_since_us_.reset();
         return true;
     }
-    short_in_a_row_ = 0;
+    drained_in_a_row_ = 0;
     long_since_us_ = long_since_us_.value_or(now_us);
     if (now_us - *long_since_us_ < kMaxWaitUs) {
         return false;

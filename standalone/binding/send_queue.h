@@ -3,7 +3,7 @@
 // Tells whether what was sent to a viewer is still on its way.
 //
 // Why so        Socket buffers and the web server hold hundreds of kilobytes. On a line of 50 kB/s a picture that waits
-//               behind them arrives ten seconds old. So a live stream lets a slow way drain, and only then takes its next
+//               behind them arrives ten seconds old. So a live stream lets a slow connection drain, and only then takes its next
 //               picture, the newest. The kernel knows how long the queues are: that to the web server, and that of the web
 //               server's TCP connection to the viewer, of which anybody may ask (sock_diag). While the latter has room,
 //               the web server holds nothing back.
@@ -35,7 +35,7 @@ class LH_PLATFORM_API SendQueue {
 
     // Whether what is sent now arrives soon: little waits, or no more than the viewer has lately taken within 100 ms.
     // After ten seconds of waiting it is true in any case, so that the slowest viewer gets a picture now and then.
-    bool IsShort();
+    bool IsDrained();
 
   private:
     struct Tcp {
@@ -44,7 +44,7 @@ class LH_PLATFORM_API SendQueue {
         std::int64_t round_trip_us = 0;
     };
 
-    bool IsShortNow(std::int64_t now_us);
+    bool IsDrainedNow(std::int64_t now_us);
     std::int64_t WaitingBytes() const;
     std::optional<Tcp> AskTcp();
     void Measure(const Tcp& tcp, std::int64_t now_us);
@@ -59,7 +59,7 @@ class LH_PLATFORM_API SendQueue {
     std::int64_t bytes_before_ = 0;    // … and in the one before
     std::int64_t round_trip_us_ = 0;   // the shortest: what is under way on a long line does not wait
     std::optional<std::int64_t> long_since_us_;
-    int short_in_a_row_ = 0;
+    int drained_in_a_row_ = 0;
     std::int64_t asked_us_ = 0;
 };
 

@@ -9,10 +9,11 @@
 #include "standalone/base/clock.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/remote/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 
+namespace remote = lookhaven::remote;
 namespace store = lookhaven::store;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
@@ -88,7 +89,7 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
             if (!server.address.empty()) {
                 const std::string secret = may_have_token ? Servers().FindSecret(server.id) : "";
                 const std::string cookie =
-                    secret.empty() ? "" : timestamp + "-" + store::MakePairToken(secret, timestamp);
+                    secret.empty() ? "" : timestamp + "-" + remote::MakePairToken(secret, timestamp);
                 m_Servers.emplace(server.id, SlaveHx(server.address, server.port, cookie));
             }
         }
@@ -113,7 +114,7 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
         const std::int64_t now = UtcSeconds();
         std::string found;
         for (const std::string& secret : Servers().SecretsOfPairedHosts()) {
-            if (store::PairTokenMatches(cookie, timestamp, secret, now)) {
+            if (remote::PairTokenMatches(cookie, timestamp, secret, now)) {
                 found = secret;
             }
         }

@@ -16,8 +16,8 @@
 #include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
+#include "standalone/camera/camera_system_calls.h"
 #include "standalone/camera/sanitizers.h"
-#include "standalone/camera/system_call_filter.h"
 
 namespace lookhaven::camera {
 

@@ -18,7 +18,7 @@
 #include "standalone/camera/camera_process.h"
 #include "standalone/camera/confinement.h"
 #include "standalone/camera/messages.h"
-#include "standalone/camera/only_host.h"
+#include "standalone/camera/resolver_guard.h"
 
 namespace {
 

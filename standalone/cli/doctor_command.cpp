@@ -21,7 +21,6 @@
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
-#include "standalone/maintenance/recorder_name.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/cameras.h"
@@ -231,7 +230,7 @@ Findings CheckRecorder(const base::Installation& installation) {
 }
 
 // Another host's recorder may record the cameras of a store that both share.
-Findings CheckRole(const base::Installation& installation) {
+Findings CheckActiveRecorder(const base::Installation& installation) {
     control::CommonConfig* config = control::MapCommonConfig(installation);
     if (config == nullptr || !control::IsRecorderAlive(*config)) {
         return {};
@@ -239,7 +238,7 @@ Findings CheckRole(const base::Installation& installation) {
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
         const std::string holder = store::RecorderLease(store).Current().holder;
-        if (!holder.empty() && holder != maintenance::RecorderName(installation)) {
+        if (!holder.empty() && holder != store::RecorderName(installation)) {
             return {{"the cameras of this store are recorded by the recorder of " + holder,
                      "stop one of the two recorders, or give each a store of its own"}};
         }
@@ -293,7 +292,7 @@ constexpr Check kChecks[] = {{"folder", CheckFolder},
                              {"mounts", CheckMounts},
                              {"host", CheckHost},
                              {"recorder", CheckRecorder},
-                             {"role", CheckRole},
+                             {"active recorder", CheckActiveRecorder},
                              {"recordings", CheckRecordings},
                              {"maintenance", CheckMaintenance},
                              {"segments", CheckSegments}};

@@ -7,7 +7,7 @@
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/mount_marker.h"
+#include "standalone/cli/mount_claim.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
@@ -59,7 +59,7 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
     RequireFreeFolder(store, mount.path, 0, false);
     mount.id = mounts.Add(mount);
-    MarkFolder(store, mount);
+    ClaimFolder(store, mount);
     return true;
 }
 
@@ -67,8 +67,8 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
 void RenewMarkers(store::Store& store) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
         try {
-            if (maintenance::MountFolder::ReadMarker(mount.path) == maintenance::MountMark{mount.id, ""}) {
-                maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkOf(store, mount.id));
+            if (maintenance::MountFolder::ReadMarker(mount.path) == maintenance::MountMarker{mount.id, ""}) {
+                maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkerFor(store, mount.id));
             }
         } catch (const std::system_error&) {
             continue;  // lookhaven doctor says what is wrong with it

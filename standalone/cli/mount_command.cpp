@@ -8,7 +8,7 @@
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/mount_marker.h"
+#include "standalone/cli/mount_claim.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -103,7 +103,7 @@ void Add(const Console& console, const Request& request) {
         mount.name = std::filesystem::path(mount.path).filename();
     }
     mount.id = Mounts(store).Add(mount);
-    MarkFolder(store, mount);
+    ClaimFolder(store, mount);
     console.Answer(ToData(*Mounts(store).Find(mount.id)), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
@@ -117,7 +117,7 @@ void Change(const Console& console, const Request& request) {
     }
     Mounts(store).Update(mount);
     if (is_marked) {
-        MarkFolder(store, mount);
+        ClaimFolder(store, mount);
     }
     console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
 }

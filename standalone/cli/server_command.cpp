@@ -18,7 +18,7 @@
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
 #include "standalone/remote/fetch.h"
-#include "standalone/store/pair_token.h"
+#include "standalone/remote/pair_token.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 
@@ -169,7 +169,7 @@ void ListCameras(const Console& console) {
 
 std::vector<RemoteCamera> AskForCameras(const RecordingServer& server, const std::string& secret) {
     const std::string timestamp = std::to_string(base::WallSeconds());
-    const std::string token = store::MakePairToken(secret, timestamp);
+    const std::string token = remote::MakePairToken(secret, timestamp);
     return CamerasInAnswer(remote::FetchJson(
         {server.address, server.port, server.certificate},
         {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));

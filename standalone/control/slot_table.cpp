@@ -139,7 +139,7 @@ std::set<std::uint64_t> SlotTable::Pairings() const {
 // The serial is read before the rest: of a slot that is taken anew in between, the old one is marked.
 void SlotTable::EndAll(const std::function<bool(const Slot&)>& is_meant) {
     for (Slot& slot : slots_) {
-        const SlotUse use{&slot, slot.serial};
+        const RequestRef use{&slot, slot.serial};
         if (use.serial != 0 && is_meant(slot)) {
             MarkEnded(use);
         }
@@ -155,13 +155,13 @@ void SlotTable::EndPairing(std::uint64_t pairing) {
     EndAll([pairing](const Slot& slot) { return slot.pairing == pairing; });
 }
 
-void SlotTable::End(const SlotUse& use) {
+void SlotTable::End(const RequestRef& use) {
     MarkEnded(use);
     Wake();
 }
 
 // Serials grow, so a mark that comes late takes no newer one away.
-void SlotTable::MarkEnded(const SlotUse& use) {
+void SlotTable::MarkEnded(const RequestRef& use) {
     std::uint64_t marked = use.slot->ended;
     while (marked < use.serial && !use.slot->ended.compare_exchange_weak(marked, use.serial)) {
     }
@@ -173,10 +173,10 @@ void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
     Wake();
 }
 
-std::optional<SlotUse> SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
-    std::optional<SlotUse> found;
+std::optional<RequestRef> SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
+    std::optional<RequestRef> found;
     for (Slot& slot : slots_) {
-        const SlotUse use{&slot, slot.serial};
+        const RequestRef use{&slot, slot.serial};
         if (IsPlayerOf(slot, session) && slot.player.key == key && (!found || use.serial > found->serial)) {
             found = use;
         }
@@ -197,7 +197,7 @@ Pause SlotTable::UnpackPause(std::uint64_t word) {
     return {(word & 1) != 0, static_cast<std::int8_t>(word >> 1 & 0xff)};
 }
 
-bool SlotTable::ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change) {
+bool SlotTable::ChangePause(const RequestRef& player, const std::function<void(Pause&)>& change) {
     std::atomic<std::uint64_t>& word = player.slot->player.pause;
     for (std::uint64_t held = word; held >> kSerialShift == player.serial;) {
         Pause pause = UnpackPause(held);

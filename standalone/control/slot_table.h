@@ -79,7 +79,7 @@ struct Slot {
 };
 
 // One request in its slot; the slot may be free, or serve another one, at any time.
-struct SlotUse {
+struct RequestRef {
     Slot* slot;
     std::uint64_t serial;
 
@@ -123,13 +123,13 @@ class SlotTable {
     // For a request process: from now on it is a player, and older players of the session may have to end.
     void BeginPlayer(Slot& slot, std::int64_t key);
     // The session's newest player under the key, which may still be opening its recording, but not one that must end.
-    std::optional<SlotUse> FindPlayer(std::string_view session, std::int64_t key) const;
+    std::optional<RequestRef> FindPlayer(std::string_view session, std::int64_t key) const;
     // Held by requests while they change more than one thing of a player, whose rate is in its progress file and whose
     // pause is in its slot. Null after a second.
     SharedLock LockPlayers() const;
     // Lets change alter what is requested of the player, in one step, which may call it several times. False when the
     // player's request is over.
-    static bool ChangePause(const SlotUse& player, const std::function<void(Pause&)>& change);
+    static bool ChangePause(const RequestRef& player, const std::function<void(Pause&)>& change);
     static Pause PauseOf(const Slot& slot) { return UnpackPause(slot.player.pause); }
     std::set<std::string> SessionsWithPlayers() const;
     // The players that must end once the session's player file names that process: all others but the newest, as many
@@ -138,9 +138,9 @@ class SlotTable {
     // Makes the host look at its players and at the processes that must end.
     void Wake();
     // Marks one request as to end and wakes the host; does nothing when it is over.
-    void End(const SlotUse& use);
+    void End(const RequestRef& use);
     // The same without waking the host, for the host.
-    static void MarkEnded(const SlotUse& use);
+    static void MarkEnded(const RequestRef& use);
 
     // Readable after Wake, until ClearWake.
     int WakeDescriptor() const { return wake_.Get(); }

@@ -10,8 +10,8 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
+#include "standalone/base/text.h"
 #include "standalone/store/secret.h"
-#include "standalone/store/text.h"
 
 namespace lookhaven::emap {
 
@@ -67,7 +67,7 @@ bool IsPictureName(std::string_view name) {
     }
     const std::string_view type = name.substr(dot + 1);
     return name.substr(0, dash).find_first_not_of("0123456789") == std::string_view::npos &&
-           store::IsHex(name.substr(dash + 1, 16), 16) &&
+           base::IsHex(name.substr(dash + 1, 16), 16) &&
            (type == "png" || type == "jpg" || type == "webp" || type == "svg");
 }
 

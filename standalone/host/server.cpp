@@ -24,7 +24,6 @@ namespace {
 constexpr std::chrono::seconds kRefusalLingers{1};
 constexpr std::chrono::seconds kWatcherRestart{1};
 constexpr std::chrono::milliseconds kAcceptAgain{200};
-constexpr int kRetryAfterSeconds = 1;
 
 int MillisUntil(Clock::time_point due) {
     if (due == Clock::time_point::max()) {
@@ -171,7 +170,7 @@ void Server::Read(int socket) {
 // client might lose the answer.
 void Server::Refuse(Connection& connection, int status, const std::string& message) {
     const std::string answer =
-        http::FailureAnswer(http::Failure(status, message, status == 503 ? kRetryAfterSeconds : 0));
+        http::FailureAnswer(http::Failure(status, message, status == 503 ? http::kRetrySoonSeconds : 0));
     ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
     ::shutdown(connection.socket.Get(), SHUT_WR);
     connection.refused = true;

@@ -8,6 +8,9 @@
 
 namespace lookhaven::http {
 
+// For a failure whose cause is gone at any moment.
+constexpr int kRetrySoonSeconds = 1;
+
 // A failure that the client is told: HTTP status, which is the answer's code too, and a message without secrets.
 class Failure : public std::runtime_error {
   public:

@@ -61,14 +61,14 @@ bool SaveMark(store::Store& store, const store::Mark& mark) {
     return store::Marks(store).Save(mark.id, mount->id, archive::PathOf(name));
 }
 
-void CompleteMarks(store::Store& store, int mount_id, std::int64_t now_s, const FootageEnds& has_ended) {
+void CompleteMarks(store::Store& store, int mount_id, std::int64_t now_s, const FootageIsComplete& is_complete) {
     for (const store::Mark& mark : store::Marks(store).Pending()) {
         if (mark.end_s > now_s) {
             continue;
         }
         try {
             // First: a row that comes in between is then seen.
-            const bool ended = has_ended(mark);
+            const bool ended = is_complete(mark);
             store::Events events(store);
             const std::vector<store::Event> footage = FootageOf(events, mark);
             const int held_by = footage.empty() ? 0 : footage.back().mount_id;

@@ -16,7 +16,7 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
-#include "standalone/archive/file.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/base/file.h"
 #include "standalone/store/settings.h"
 
@@ -32,21 +32,21 @@ constexpr int kMaxCamera = 1'000'000;
 constexpr const char* kLogName = "seconds";
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
-std::string MarkerText(const MountMark& mark) {
-    return std::string(kMarkerBegin) + std::to_string(mark.mount_id) +
-           (mark.installation.empty() ? "" : std::string(kMarkerOwner) + mark.installation) + "\n";
+std::string MarkerText(const MountMarker& marker) {
+    return std::string(kMarkerBegin) + std::to_string(marker.mount_id) +
+           (marker.installation.empty() ? "" : std::string(kMarkerOwner) + marker.installation) + "\n";
 }
 
-std::optional<MountMark> ParseMarker(const std::string& text) {
-    MountMark mark;
+std::optional<MountMarker> ParseMarker(const std::string& text) {
+    MountMarker marker;
     if (text.starts_with(kMarkerBegin)) {
-        std::from_chars(text.data() + kMarkerBegin.size(), text.data() + text.size(), mark.mount_id);
+        std::from_chars(text.data() + kMarkerBegin.size(), text.data() + text.size(), marker.mount_id);
     }
     if (const std::size_t at = text.find(kMarkerOwner); at != text.npos && text.ends_with('\n')) {
-        mark.installation = text.substr(at + kMarkerOwner.size());
-        mark.installation.pop_back();
+        marker.installation = text.substr(at + kMarkerOwner.size());
+        marker.installation.pop_back();
     }
-    return MarkerText(mark) == text ? std::optional(mark) : std::nullopt;
+    return MarkerText(marker) == text ? std::optional(marker) : std::nullopt;
 }
 
 // Empty when there is no such folder. Throws std::system_error when it cannot be told.
@@ -111,17 +111,17 @@ std::int64_t MountSpace::ReserveFiles() const {
     return std::min<std::int64_t>(total_files / 50, 10'000);
 }
 
-void MountFolder::WriteMarker(const std::filesystem::path& folder, const MountMark& mark) {
-    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(mark), 0600);
+void MountFolder::WriteMarker(const std::filesystem::path& folder, const MountMarker& marker) {
+    archive::WriteFileAtomically(folder / kMarkerName, MarkerText(marker), 0600);
 }
 
-std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, const MountMark& mark) {
-    return ReadMarker(folder) == mark
+std::optional<MountFolder> MountFolder::Open(const std::filesystem::path& folder, const MountMarker& marker) {
+    return ReadMarker(folder) == marker
                ? std::optional(MountFolder(folder, base::OpenFile(folder, O_RDONLY | O_DIRECTORY)))
                : std::nullopt;
 }
 
-std::optional<MountMark> MountFolder::ReadMarker(const std::filesystem::path& folder) {
+std::optional<MountMarker> MountFolder::ReadMarker(const std::filesystem::path& folder) {
     try {
         return ParseMarker(archive::ReadFile(folder / kMarkerName, kMaxMarkerBytes));
     } catch (const std::system_error& error) {
@@ -249,12 +249,12 @@ int MountFolder::LastCamera() const {
     return last;
 }
 
-MountMark MarkOf(store::Store& store, int mount_id) {
+MountMarker MarkerFor(store::Store& store, int mount_id) {
     return {mount_id, store::Settings(store).Installation()};
 }
 
 std::optional<MountFolder> OpenMount(store::Store& store, const store::Mount& mount) {
-    return MountFolder::Open(mount.path, MarkOf(store, mount.id));
+    return MountFolder::Open(mount.path, MarkerFor(store, mount.id));
 }
 
 }  // namespace lookhaven::maintenance

@@ -40,24 +40,24 @@ bool MeansAbsent(int error);
 constexpr const char* kMarkerName = ".lookhaven-mount";
 
 // What a marker says.
-struct MountMark {
+struct MountMarker {
     int mount_id = 0;
     std::string installation;  // store::Settings::Installation; empty in markers of early versions
 
-    bool operator==(const MountMark&) const = default;
+    bool operator==(const MountMarker&) const = default;
 };
 
 class MountFolder {
   public:
     // Makes the folder that of the mount; another marker is replaced. Only when an owner says so: a folder that merely
     // looks empty may be a mount point without its disk. Throws std::system_error.
-    static void WriteMarker(const std::filesystem::path& folder, const MountMark& mark);
+    static void WriteMarker(const std::filesystem::path& folder, const MountMarker& marker);
     // Nothing when there is none, or what is there is no marker. Throws std::system_error when that cannot be told.
-    static std::optional<MountMark> ReadMarker(const std::filesystem::path& folder);
+    static std::optional<MountMarker> ReadMarker(const std::filesystem::path& folder);
 
     // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted. Throws std::system_error
     // when that cannot be told.
-    static std::optional<MountFolder> Open(const std::filesystem::path& folder, const MountMark& mark);
+    static std::optional<MountFolder> Open(const std::filesystem::path& folder, const MountMarker& marker);
 
     const std::filesystem::path& Path() const { return path_; }
     // Throws std::system_error.
@@ -96,7 +96,7 @@ class MountFolder {
 };
 
 // The marker that the mount's folder must have.
-MountMark MarkOf(store::Store& store, int mount_id);
+MountMarker MarkerFor(store::Store& store, int mount_id);
 // MountFolder::Open with that marker. Throws store::StoreError, too.
 std::optional<MountFolder> OpenMount(store::Store& store, const store::Mount& mount);
 

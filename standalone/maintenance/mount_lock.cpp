@@ -8,7 +8,7 @@
 #include <sys/file.h>
 #include <sys/stat.h>
 
-#include "standalone/archive/file.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/maintenance/mount_folder.h"
 
 namespace lookhaven::maintenance {

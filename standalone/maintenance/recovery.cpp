@@ -30,12 +30,13 @@ bool Try(Work&& work) {
     }
 }
 
-bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_own_id, std::int64_t now_s) {
+bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_reserved_id,
+                 std::int64_t now_s) {
     bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
-        if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_own_id &&
+        if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_reserved_id &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
-            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, first_own_id); });
+            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, first_reserved_id); });
         }
     }
     return is_complete;
@@ -43,21 +44,21 @@ bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, 
 
 }  // namespace
 
-bool Recover(store::Store& store, const store::Mount& mount, int first_own_id, std::int64_t now_s) {
+bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
     if (!folder) {
         return false;
     }
-    FinishRemovals(store, mount, *folder, now_s);
+    FinishDeletions(store, mount, *folder, now_s);
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
     bool is_complete = true;
     store::Events events(store);
     for (const store::Event& row : events.Open()) {
-        if (row.mount_id == mount.id && row.id < first_own_id && !row.demo) {
+        if (row.mount_id == mount.id && row.id < first_reserved_id && !row.demo) {
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    return AdoptRecent(events, *folder, mount.id, first_own_id, now_s) && is_complete;
+    return AdoptRecent(events, *folder, mount.id, first_reserved_id, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

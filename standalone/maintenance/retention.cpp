@@ -45,7 +45,7 @@ class Retention {
           has_age_limit_(age_limit == AgeLimit::kApplies && mount.max_age_s > 0) {}
 
     RetentionResult Run() {
-        FinishRemovals();
+        FinishDeletions();
         const MountSpace space = folder_.Space();
         excess_bytes_ = ExcessBytes(space);
         excess_files_ = ExcessFiles(space);
@@ -53,7 +53,7 @@ class Retention {
         std::vector<store::Event> misdated;
         int after = 0;
         for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
-            const std::vector<store::Event> oldest = events_.Oldest(mount_.id, after, kEventsAtOnce);
+            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
             std::vector<store::Event> chosen;
             has_more = oldest.size() == kEventsAtOnce;
             for (const store::Event& event : oldest) {
@@ -74,22 +74,22 @@ class Retention {
         return deleted_;
     }
 
-    // The rows in removal: those of this pass, and those that a crash left.
-    void FinishRemovals() {
-        std::vector<store::Event> going = events_.InRemoval(mount_.id);
+    // The rows pending deletion: those of this pass, and those that a crash left.
+    void FinishDeletions() {
+        std::vector<store::Event> pending = events_.PendingDeletion(mount_.id);
         std::exception_ptr failure;
-        for (auto event = going.begin(); event != going.end(); ++event) {
+        for (auto event = pending.begin(); event != pending.end(); ++event) {
             try {
                 RemoveFile(*event);
             } catch (const std::system_error&) {
                 failure = std::current_exception();
-                events_.CancelRemoval(IdsOf({event, going.end()}));
-                going.erase(event, going.end());
+                events_.CancelDeletion(IdsOf({event, pending.end()}));
+                pending.erase(event, pending.end());
                 break;
             }
         }
         std::map<int, std::int64_t> ends_s;  // of what each camera has lost
-        for (const store::Event& event : going) {
+        for (const store::Event& event : pending) {
             ++deleted_.events;
             deleted_.bytes += event.size_bytes;
             // What a wrong clock dated ahead says nothing about the marks before it.
@@ -101,12 +101,12 @@ class Retention {
         for (const auto& [camera, end_s] : ends_s) {
             RemoveMarks(camera, end_s);
         }
-        for (const store::Event& event : going) {
+        for (const store::Event& event : pending) {
             if (archive::DayOf(event.start_s) != archive::DayOf(now_s_)) {
                 folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
             }
         }
-        events_.FinishRemoval(IdsOf(going));
+        events_.FinishDeletion(IdsOf(pending));
         if (failure) {
             std::rethrow_exception(failure);
         }
@@ -146,8 +146,8 @@ class Retention {
 
     void Delete(std::span<const store::Event> events) {
         if (!events.empty()) {
-            events_.BeginRemoval(IdsOf(events));
-            FinishRemovals();
+            events_.BeginDeletion(IdsOf(events));
+            FinishDeletions();
         }
     }
 
@@ -258,8 +258,8 @@ RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount,
     return folder ? Retention(store, mount, *folder, now_s, age_limit).Run() : RetentionResult{};
 }
 
-void FinishRemovals(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s) {
-    Retention(store, mount, folder, now_s, AgeLimit::kWaits).FinishRemovals();
+void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s) {
+    Retention(store, mount, folder, now_s, AgeLimit::kWaits).FinishDeletions();
 }
 
 }  // namespace lookhaven::maintenance

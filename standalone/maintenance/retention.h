@@ -3,7 +3,7 @@
 // Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
 //
 // Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
-//               (2) The row is put in removal, where no search finds it, the file is removed, then the row. A file that
+//               (2) The row becomes pending deletion, where no search finds it, the file is removed, then the row. A file that
 //                   cannot be removed gets its row back; what a crash leaves in between is finished by the next pass.
 //               (3) Archived and growing events and those on unmounted mounts are kept.
 //               (4) A mark is removed with the last of its footage.
@@ -36,7 +36,7 @@ enum class AgeLimit { kApplies, kWaits };  // waits while the clock cannot be tr
 RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
                                  AgeLimit age_limit);
 
-// Finishes what a crash left in removal on the mount. Throws as EnforceRetention.
-void FinishRemovals(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s);
+// Finishes the deletions that a crash interrupted on the mount. Throws as EnforceRetention.
+void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s);
 
 }  // namespace lookhaven::maintenance

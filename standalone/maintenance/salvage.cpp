@@ -6,8 +6,8 @@
 
 #include <fcntl.h>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/matroska_blocks.h"
+#include "standalone/archive/mount_file.h"
 
 namespace lookhaven::maintenance {
 
@@ -84,13 +84,13 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
 }
 
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int free_from) {
+                           int first_reserved_id) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     if (contents.frame_count == 0) {
         return Discard(mount, name);
     }
     archive::FileName kept = name;
-    if (name.event >= free_from || events.Find(name.event)) {
+    if (name.event >= first_reserved_id || events.Find(name.event)) {
         kept.event = events.NextId();
         if (!mount.Renumber(name, kept.event)) {
             return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";

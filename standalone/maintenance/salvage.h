@@ -24,11 +24,11 @@ store::Event RowOf(const archive::FileName& name, int mount_id, const archive::C
 std::string CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row);
 
 // Gives a recording without a row one, or removes a file that never got as far as its first frame. It keeps its id below
-// free_from, where the store gives out no more ids, unless another event has it: a store that was restored from a backup
+// first_reserved_id, where the store gives out no more ids, unless another event has it: a store that was restored from a backup
 // gives out ids anew. Else it gets a new one. A file that is no recording of ours is left alone, which the sentence says.
 // Throws as CloseEvent.
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int free_from);
+                           int first_reserved_id);
 
 // Whether the row is that of this recording.
 bool IsRowOf(const std::optional<store::Event>& row, const archive::FileName& name);

@@ -3,19 +3,15 @@
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <limits>
 #include <map>
 #include <set>
 #include <unordered_map>
 
-#include <fcntl.h>
-
-#include "standalone/archive/file.h"
-#include "standalone/archive/frame_index.h"
-#include "standalone/archive/matroska_blocks.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
+#include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
@@ -29,81 +25,6 @@ namespace {
 // A recorder's new file has its index and its row well before it is this old.
 constexpr std::int64_t kMinAgeS = 10;
 
-using Frames = std::vector<archive::FrameEntry>;
-
-// Whether a recording and its index agree.
-struct Inspection {
-    std::string problem;  // empty when they agree
-    bool is_growing = false;
-    bool must_rebuild_index = false;  // the index claims to be complete, and is wrong
-    // Damage in the middle; the frames after it, which the index names, may still be read.
-    bool is_damaged_inside = false;
-    std::int64_t frames = 0;
-};
-
-bool IsCode(const std::exception& failure, std::initializer_list<int> codes) {
-    const auto* error = dynamic_cast<const std::system_error*>(&failure);
-    return error != nullptr && std::ranges::find(codes, error->code().value()) != codes.end();
-}
-
-// What says something of the disk rather than of one file on it.
-bool IsDiskFailure(const std::exception& failure) {
-    return dynamic_cast<const std::system_error*>(&failure) != nullptr &&
-           !IsCode(failure, {ENOENT, ENOTDIR, ELOOP, EBUSY, EEXIST});
-}
-
-Frames WalkRecording(const std::filesystem::path& path) {
-    const base::FileDescriptor file = archive::OpenFile(path, O_RDONLY);
-    Frames frames;
-    archive::MatroskaBlocks blocks(file.Get());
-    while (blocks.ReadCluster(frames)) {
-    }
-    frames.erase(frames.begin(), std::ranges::find_if(frames, &archive::FrameEntry::key));
-    return frames;
-}
-
-Inspection Inspect(const std::filesystem::path& path) {
-    Inspection result;
-    Frames indexed;
-    try {
-        archive::FrameIndexReader index(archive::IndexPathOf(path));
-        result.is_growing = index.IsGrowing();
-        if (result.is_growing) {
-            return result;
-        }
-        index.ReadNew(archive::SizeOf(archive::OpenFile(path, O_RDONLY), path), indexed);
-        if (!index.IsFinished()) {
-            result.problem = "the recording " + path.string() + " was never closed";
-            return result;
-        }
-    } catch (const std::exception& failure) {
-        if (IsDiskFailure(failure)) {
-            throw;
-        }
-        result.problem = std::string("an index cannot be used: ") + failure.what();
-        result.must_rebuild_index = true;
-        return result;
-    }
-    result.frames = static_cast<std::int64_t>(indexed.size());
-    Frames found;
-    try {
-        found = WalkRecording(path);
-    } catch (const archive::ArchiveError& failure) {
-        result.problem = "the recording " + path.string() + " cannot be read: " + failure.what();
-    }
-    if (found == indexed && result.problem.empty()) {
-        return result;
-    }
-    result.is_damaged_inside = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());
-    result.must_rebuild_index = !result.is_damaged_inside;
-    if (result.problem.empty()) {
-        result.problem = result.is_damaged_inside ? "the recording " + path.string() + " is damaged after frame " +
-                                                        std::to_string(found.size())
-                                                  : "the index of " + path.string() + " does not name its frames";
-    }
-    return result;
-}
-
 class Verification {
   public:
     Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress)
@@ -111,8 +32,8 @@ class Verification {
           events_(store),
           repair_(repair),
           progress_(progress),
-          known_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
-          free_from_(std::min(known_id_, store::RecorderLease(store).Current().first_own_id)) {}
+          next_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
+          first_reserved_id_(std::min(next_id_, store::RecorderLease(store).Current().first_reserved_id)) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
@@ -138,7 +59,7 @@ class Verification {
             return;
         }
         if (repair_) {
-            FinishRemovals(store_, mount, *folder, base::WallSeconds());
+            FinishDeletions(store_, mount, *folder, base::WallSeconds());
         }
         for (std::size_t i = 0; i < rows.size(); ++i) {
             Try([&] { CheckRow(*folder, rows[i]); });
@@ -244,7 +165,7 @@ class Verification {
         for (const store::Event& row : rows) {
             expected.insert(row.path);
         }
-        for (const store::Event& row : events_.InRemoval(mount_id)) {
+        for (const store::Event& row : events_.PendingDeletion(mount_id)) {
             expected.insert(row.path);
         }
         for (const store::Mark& mark : store::Marks(store_).OnMount(mount_id)) {
@@ -272,7 +193,7 @@ class Verification {
         case archive::FileKind::kRecording:
             if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
                 Report("no event has the file " + path,
-                       [&] { return AdoptRecording(events_, mount, mount_id, name, free_from_); });
+                       [&] { return AdoptRecording(events_, mount, mount_id, name, first_reserved_id_); });
             }
             break;
         case archive::FileKind::kIndex:
@@ -299,7 +220,7 @@ class Verification {
 
     // A file with an id that this store never gave out may belong to another store: left alone.
     std::string RemoveStray(const MountFolder& mount, const archive::FileName& name, bool store_is_empty) const {
-        if (store_is_empty || name.event > known_id_) {
+        if (store_is_empty || name.event > next_id_) {
             return "";
         }
         return mount.Remove(name) ? "removed" : "";
@@ -309,8 +230,8 @@ class Verification {
     store::Events events_;
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
-    const int known_id_;
-    const int free_from_;  // a recorder may still give out the ids from here on
+    const int next_id_;
+    const int first_reserved_id_;  // a recorder may still give out the ids from here on
     VerifyReport report_;
 };
 

@@ -8,9 +8,9 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
-#include "standalone/archive/file.h"
 #include "standalone/archive/frame_index.h"
 #include "standalone/archive/layout.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"

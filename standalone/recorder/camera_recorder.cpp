@@ -39,7 +39,7 @@ CameraRecorder::~CameraRecorder() {
 }
 
 void CameraRecorder::Take(Frame frame) {
-    const std::int64_t distance_us = DistanceAfter(frame);
+    const std::int64_t interval_us = IntervalAfter(frame);
     if (frame.medium == base::Medium::kVideo) {
         last_picture_us_ = context_.monotonic_us();
     }
@@ -53,17 +53,17 @@ void CameraRecorder::Take(Frame frame) {
         pre_record_.Add(std::move(frame), request_.plan.pre_s);
         Begin();
     }
-    distance_us_ = distance_us;
+    interval_us_ = interval_us;
 }
 
-std::int64_t CameraRecorder::DistanceAfter(const Frame& frame) {
+std::int64_t CameraRecorder::IntervalAfter(const Frame& frame) {
     if (frame.medium != base::Medium::kVideo) {
-        return distance_us_;
+        return interval_us_;
     }
     const std::int64_t before_us = std::exchange(previous_us_, frame.timestamp_us);
-    const std::int64_t distance_us =
+    const std::int64_t interval_us =
         before_us == 0 ? 0 : std::clamp<std::int64_t>(frame.timestamp_us - before_us, 0, kMaxDistanceUs);
-    return distance_us_ + (distance_us - distance_us_) / 4;
+    return interval_us_ + (interval_us - interval_us_) / 4;
 }
 
 void CameraRecorder::Tick() {
@@ -111,7 +111,7 @@ int CameraRecorder::Reason() const {
 // Of more than a few seconds, and not of a camera that always sends so few pictures.
 bool CameraRecorder::IsAfterGap(const Frame& frame) const {
     return frame.medium == base::Medium::kVideo &&
-           frame.timestamp_us - newest_us_ > std::max(kMaxGapUs, 3 * distance_us_);
+           frame.timestamp_us - newest_us_ > std::max(kMaxGapUs, 3 * interval_us_);
 }
 
 void CameraRecorder::Write(const Frame& frame) {

@@ -66,7 +66,7 @@ class CameraRecorder {
     std::int64_t WallOf(std::int64_t timestamp_us) const;
     bool IsWanted() const;
     int Reason() const;
-    std::int64_t DistanceAfter(const Frame& frame);
+    std::int64_t IntervalAfter(const Frame& frame);
     bool MustEndBefore(const Frame& frame);
     bool IsAfterGap(const Frame& frame) const;
     bool MayCutByTimes();
@@ -88,7 +88,7 @@ class CameraRecorder {
     std::int64_t last_picture_us_ = 0;
     std::int64_t newest_us_ = 0;    // capture time of the newest picture of the open event
     std::int64_t previous_us_ = 0;  // capture time of the picture before
-    std::int64_t distance_us_ = 0;  // of pictures, smoothed
+    std::int64_t interval_us_ = 0;  // of pictures, smoothed
     bool has_gap_ = false;          // in the open event, which ends before the next key frame
     std::int64_t cuts_paid_until_us_ = std::numeric_limits<std::int64_t>::min() / 2;
     std::int64_t last_flush_us_ = 0;

@@ -20,7 +20,7 @@ constexpr std::int64_t kMaxDelayS = 3;
 }  // namespace
 
 EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder)
-    : role_(recorder, base::MonotonicMicros),
+    : lease_(recorder, base::MonotonicMicros),
       thread_(store_url, "store the events, recording goes on",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -85,9 +85,9 @@ std::vector<store::Mark> EventRowQueue::PendingMarks() const {
     return pending_marks_;
 }
 
-std::optional<int> EventRowQueue::FirstOwnId() const {
+std::optional<int> EventRowQueue::FirstReservedId() const {
     const std::lock_guard lock(mutex_);
-    return first_own_id_;
+    return first_reserved_id_;
 }
 
 void EventRowQueue::RequestStop() {
@@ -113,9 +113,9 @@ void EventRowQueue::Work(store::Store& store) {
     for (const int id : dirty) {
         is_all_stored &= StoreRow(events, id);
     }
-    if (HoldRole(store)) {
+    if (HoldLease(store)) {
         FillReserve(events);
-        HoldRole(store);  // tells which ids are taken
+        HoldLease(store);  // tells which ids are taken
     }
     std::vector<store::Mark> pending = store::Marks(store).Pending();
     const std::lock_guard lock(mutex_);
@@ -126,13 +126,13 @@ void EventRowQueue::Work(store::Store& store) {
     }
 }
 
-bool EventRowQueue::HoldRole(store::Store& store) {
-    const bool is_held = role_.Hold(store, FirstOwnId().value_or(std::numeric_limits<int>::max()));
+bool EventRowQueue::HoldLease(store::Store& store) {
+    const bool is_held = lease_.Hold(store, FirstReservedId().value_or(std::numeric_limits<int>::max()));
     is_refused_ = !is_held;
     if (!is_held) {
         const std::lock_guard lock(mutex_);
         reserve_.clear();
-        first_own_id_.reset();
+        first_reserved_id_.reset();
     }
     return is_held;
 }
@@ -142,7 +142,7 @@ void EventRowQueue::FillReserve(store::Events& events) {
     bool is_first = false;
     {
         const std::lock_guard lock(mutex_);
-        is_first = !first_own_id_;
+        is_first = !first_reserved_id_;
         if (reserve_.size() * 2 <= wanted_reserve_ || is_first) {
             missing = wanted_reserve_ - reserve_.size();
         }
@@ -153,7 +153,7 @@ void EventRowQueue::FillReserve(store::Events& events) {
     const int count = static_cast<int>(std::max<std::size_t>(missing, 1));
     const int first = events.NextIds(count);
     const std::lock_guard lock(mutex_);
-    first_own_id_ = first_own_id_.value_or(first);
+    first_reserved_id_ = first_reserved_id_.value_or(first);
     for (int id = first; id < first + count; ++id) {
         reserve_.push_back(id);
     }

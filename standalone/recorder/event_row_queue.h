@@ -17,7 +17,7 @@
 #include <string>
 #include <vector>
 
-#include "standalone/recorder/recorder_role.h"
+#include "standalone/recorder/lease_keeper.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -52,7 +52,7 @@ class EventRowQueue {
     // The marks whose footage is still to come, as of the last refresh.
     std::vector<store::Mark> PendingMarks() const;
     // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
-    std::optional<int> FirstOwnId() const;
+    std::optional<int> FirstReservedId() const;
 
     // As in StoreThread; rows already queued are stored first.
     void RequestStop();
@@ -66,20 +66,20 @@ class EventRowQueue {
     };
 
     void Work(store::Store& store);
-    bool HoldRole(store::Store& store);
+    bool HoldLease(store::Store& store);
     void FillReserve(store::Events& events);
     bool StoreRow(store::Events& events, int id);
 
     mutable std::mutex mutex_;
     std::map<int, Entry> entries_;
     std::deque<int> reserve_;
-    std::optional<int> first_own_id_;
+    std::optional<int> first_reserved_id_;
     std::size_t wanted_reserve_ = 0;
     std::vector<store::Mark> pending_marks_;
     std::map<int, std::int64_t> written_until_s_;  // of the cameras that are recorded
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;
-    RecorderRole role_;  // only the thread uses it
+    LeaseKeeper lease_;  // only the thread uses it
     std::atomic<bool> is_refused_ = false;
     StoreThread thread_;  // last: it uses the others
 };

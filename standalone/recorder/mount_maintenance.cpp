@@ -45,7 +45,7 @@ void MountMaintenance::Work(store::Store& store) {
     const std::int64_t now_s = base::WallSeconds();
     const Clock clock{now_s, clock_watch_.IsTrusted(now_us, now_s)};
     // Without numbers of its own the recorder could not tell its events from those of another one.
-    if (!context_.first_own_id()) {
+    if (!context_.first_reserved_id()) {
         is_recovered_ = false;
         return;
     }
@@ -82,7 +82,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         after_recovery_.Begin(now_us);
         try {
             recovery_failure_.clear();
-            is_recovered_ = maintenance::Recover(store, mount, context_.first_own_id().value_or(0), clock.now_s);
+            is_recovered_ = maintenance::Recover(store, mount, context_.first_reserved_id().value_or(0), clock.now_s);
         } catch (const std::system_error& error) {
             recovery_failure_ = error.what();  // one folder that cannot be read must not stop retention
         }
@@ -90,7 +90,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
             after_recovery_ = {};
         }
     }
-    maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.has_ended);
+    maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.is_complete);
     const int space_requests = context_.space_requests;
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;

@@ -25,8 +25,8 @@ namespace lookhaven::recorder {
 // What the maintenance of all mounts shares. Borrowed: everything in it outlives them.
 struct MaintenanceContext {
     std::string store_url;
-    std::function<std::optional<int>()> first_own_id;  // as EventRowQueue::FirstOwnId
-    maintenance::FootageEnds has_ended;
+    std::function<std::optional<int>()> first_reserved_id;  // as EventRowQueue::FirstReservedId
+    maintenance::FootageIsComplete is_complete;
     const std::atomic<int>& space_requests;  // grows when a disk is full
 };
 

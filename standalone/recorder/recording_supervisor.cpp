@@ -7,7 +7,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/marks.h"
-#include "standalone/maintenance/recorder_name.h"
+#include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::recorder {
 
@@ -20,7 +20,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
           maintenance::WriteRecordingStatus(installation, states.cameras);
           maintenance::WriteMountStatus(installation, states.mounts);
       }),
-      rows_(installation.StoreUrl(), maintenance::RecorderName(installation)),
+      rows_(installation.StoreUrl(), store::RecorderName(installation)),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(),
@@ -170,7 +170,7 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
             Start("maintenance of mount " + std::to_string(id), [&, id = id] {
                 mounts_.emplace(
                     id, std::make_unique<MountMaintenance>(
-                            id, MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstOwnId(); },
+                            id, MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstReservedId(); },
                                                    [this](const store::Mark& mark) { return FootageHasEnded(mark); },
                                                    space_requests_}));
             });
@@ -183,7 +183,7 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
 
 // No row will come, neither from this recorder nor of what an earlier one left on a mount.
 bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
-    if (rows_.IsRefused() || !rows_.FirstOwnId()) {
+    if (rows_.IsRefused() || !rows_.FirstReservedId()) {
         return false;  // another recorder has the footage
     }
     return (are_mounts_recovered_ || mark.start_s > started_s_) && rows_.HasStored(mark.camera_id, mark.end_s);

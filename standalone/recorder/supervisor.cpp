@@ -68,7 +68,7 @@ std::chrono::milliseconds Supervisor::TimeToNextStep() const {
 void Supervisor::DoEverySecond() {
     const std::int64_t now_us = base::MonotonicMicros();
     if (next_second_us_ != 0 && now_us - next_second_us_ > kStandstillUs) {
-        base::LogWarning("the recorder stood still for " + std::to_string((now_us - next_second_us_) / 1'000'000) +
+        base::LogWarning("the recorder did not run for " + std::to_string((now_us - next_second_us_) / 1'000'000) +
                          " s, of which nothing is recorded: it was stopped, or the machine is overloaded");
     }
     next_second_us_ = now_us + 1'000'000;

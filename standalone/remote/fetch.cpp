@@ -3,7 +3,7 @@
 
 #include <dlfcn.h>
 
-#include "standalone/remote/library.h"
+#include "standalone/remote/transfer.h"
 
 namespace lookhaven::remote {
 

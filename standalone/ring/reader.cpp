@@ -139,7 +139,7 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position) {
     return read.PinCurrent(head.newest_key);  // of an audio ring the newest entry
 }
 
-const Entry* ReadNext(void* ring, int last_sequence, Position* position, const Companion& other, int wait_millis) {
+const Entry* ReadNext(void* ring, int last_sequence, Position* position, const SecondReader& other, int wait_millis) {
     const SegmentHead& head = View(ring).Head();
     const SegmentHead& other_head = View(other.ring).Head();
     const std::int64_t deadline = Deadline(wait_millis);

@@ -57,13 +57,13 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
 // newest key frame, or the newest entry of an audio ring. Never waits.
 const Entry* ReadNext(void* ring, int last_sequence, Position* position);
 // A stream's other ring and how far the caller has read it; both are borrowed.
-struct Companion {
+struct SecondReader {
     void* ring = nullptr;
     const Position* position = nullptr;
 };
 // As ReadNext, but while neither ring holds anything unread it waits up to wait_millis (at most kMaxWaitMillis) for an
 // entry of either. A signal cuts the wait. Where the kernel cannot wait for two rings it returns at once.
-const Entry* ReadNext(void* ring, int last_sequence, Position* position, const Companion& other,
+const Entry* ReadNext(void* ring, int last_sequence, Position* position, const SecondReader& other,
                       int wait_millis = kMaxWaitMillis);
 // The newest key frame, or null. Pinned for the process until ReadIFrameFinish.
 const Entry* ReadLatestIFrame(void* ring);

@@ -36,7 +36,7 @@ std::string WithTimeouts(std::string location) {
 
 // A Store is used by one thread, so connections need no locks of their own: they would be taken for each column of each
 // row. Before the first connection; SQLite refuses it later, which costs nothing but the time.
-void LeaveOutSqliteLocks() {
+void UseSqliteWithoutMutexes() {
     static const int done = [] {
         sqlite_api::sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
         return sqlite_api::sqlite3_config(SQLITE_CONFIG_MULTITHREAD);
@@ -66,7 +66,7 @@ StoreAddress StoreAddress::Parse(const std::string& url) {
 Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
     try {
         if (engine_ == Engine::kSqlite) {
-            LeaveOutSqliteLocks();
+            UseSqliteWithoutMutexes();
             session_.open(soci::sqlite3, "db=\"" + address.location + "\" timeout=" + kBusyTimeoutS);
             session_ << "pragma foreign_keys = on";
         } else {

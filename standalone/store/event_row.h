@@ -21,11 +21,11 @@ struct Mapping<Event> {
     }
 };
 
-struct EventInRemoval : Event {};
+struct EventPendingDeletion : Event {};
 
 template <>
-struct Mapping<EventInRemoval> : Mapping<Event> {
-    static constexpr const char* kTable = "events_in_removal";
+struct Mapping<EventPendingDeletion> : Mapping<Event> {
+    static constexpr const char* kTable = "events_pending_deletion";
 };
 
 }  // namespace lookhaven::store

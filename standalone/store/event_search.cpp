@@ -92,16 +92,16 @@ std::vector<Event> Events::Open() {
     return connection_.FetchAll<Event>("where recording = 1 order by id");
 }
 
-std::vector<Event> Events::InRemoval(int mount_id) {
+std::vector<Event> Events::PendingDeletion(int mount_id) {
     std::vector<Event> events;
     connection_.Read([&](soci::session& sql) {
-        Query<EventInRemoval>(sql, kOnce, "where mount_id = :mount order by id", mount_id)
+        Query<EventPendingDeletion>(sql, kOnce, "where mount_id = :mount order by id", mount_id)
             .ForEach([&](const Event& event) { events.push_back(event); });
     });
     return events;
 }
 
-std::vector<Event> Events::Oldest(int mount_id, int after_id, int limit) {
+std::vector<Event> Events::InRecordingOrder(int mount_id, int after_id, int limit) {
     return connection_.FetchAll<Event>(
         "where mount_id = :mount and id > :after and recording = 0 and archived = 0 and demo = 0 order by id"
         " limit :limit",

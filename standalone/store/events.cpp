@@ -124,16 +124,17 @@ int Events::Remove(std::span<const int> ids) {
         [&](soci::session& sql) { return ForEachId(sql, ids, "delete from events where id = :id"); });
 }
 
-void Events::BeginRemoval(std::span<const int> ids) {
-    Move(connection_, ids, "events", "events_in_removal", " and recording = 0 and archived = 0");
+void Events::BeginDeletion(std::span<const int> ids) {
+    Move(connection_, ids, "events", "events_pending_deletion", " and recording = 0 and archived = 0");
 }
 
-void Events::FinishRemoval(std::span<const int> ids) {
-    connection_.Write([&](soci::session& sql) { ForEachId(sql, ids, "delete from events_in_removal where id = :id"); });
+void Events::FinishDeletion(std::span<const int> ids) {
+    connection_.Write(
+        [&](soci::session& sql) { ForEachId(sql, ids, "delete from events_pending_deletion where id = :id"); });
 }
 
-void Events::CancelRemoval(std::span<const int> ids) {
-    Move(connection_, ids, "events_in_removal", "events", "");
+void Events::CancelDeletion(std::span<const int> ids) {
+    Move(connection_, ids, "events_pending_deletion", "events", "");
 }
 
 int Events::RemoveDemo() {

@@ -3,7 +3,7 @@
 // Recorded events: a row for each file of a camera's recording.
 //
 // Why so        The file is the record, the row is how it is found. So a row is made after its file exists, and while
-//               the file is being removed, the row is in removal, where no search finds it: a row that is found never
+//               the file is being removed, the row is pending deletion, where no search finds it: a row that is found never
 //               points at nothing. There is no row per frame.
 // Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found
 //                   by looking at a bounded stretch of the index (camera, start), however many events there are.
@@ -91,12 +91,12 @@ class Events {
     // In one transaction; returns the number of rows removed. For rows without a file.
     int Remove(std::span<const int> ids);
 
-    // Removing files with their rows. Until FinishRemoval or CancelRemoval the rows are found by InRemoval alone. Each is
-    // one transaction. BeginRemoval leaves out growing and archived events: remove the files of InRemoval only.
-    void BeginRemoval(std::span<const int> ids);
-    void FinishRemoval(std::span<const int> ids);
-    void CancelRemoval(std::span<const int> ids);  // the rows are as before
-    std::vector<Event> InRemoval(int mount_id);    // by id
+    // Removing files with their rows. Until FinishDeletion or CancelDeletion the rows are found by PendingDeletion alone. Each is
+    // one transaction. BeginDeletion leaves out growing and archived events: remove the files of PendingDeletion only.
+    void BeginDeletion(std::span<const int> ids);
+    void FinishDeletion(std::span<const int> ids);
+    void CancelDeletion(std::span<const int> ids);     // the rows are as before
+    std::vector<Event> PendingDeletion(int mount_id);  // by id
     // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call
     // removes.
     int RemoveDemo();
@@ -112,7 +112,7 @@ class Events {
     std::vector<Event> Open();
     // Finished events of the mount that are neither archived nor demo, with ids above after_id, by id: in the order in
     // which they were recorded, whatever the clock said.
-    std::vector<Event> Oldest(int mount_id, int after_id, int limit);
+    std::vector<Event> InRecordingOrder(int mount_id, int after_id, int limit);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.

@@ -128,7 +128,7 @@ void Mounts::Remove(int id, bool forget_events) {
         if (held > 0) {
             throw InvalidRecord("the mount \"" + mount.name + "\" holds " + std::to_string(held) + " recordings");
         }
-        Execute(sql, "delete from events_in_removal where mount_id = :id", id);
+        Execute(sql, "delete from events_pending_deletion where mount_id = :id", id);
         Execute(sql, "delete from mounts where id = :id", id);
     });
 }

@@ -1,30 +1,39 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/recorder_lease.h"
 
+#include <array>
 #include <tuple>
+
+#include <unistd.h>
 
 #include "standalone/store/connection.h"
 
 namespace lookhaven::store {
 
 template <>
-struct Mapping<RecorderRole> {
+struct Mapping<LeaseState> {
     static constexpr const char* kTable = "recorder_lease";
-    static constexpr const char* kColumns = "count, holder, first_own_id";
-    static auto Members(auto& role) { return std::tie(role.count, role.holder, role.first_own_id); }
+    static constexpr const char* kColumns = "count, holder, first_reserved_id";
+    static auto Members(auto& state) { return std::tie(state.count, state.holder, state.first_reserved_id); }
 };
 
-RecorderRole RecorderLease::Current() {
-    return connection_.FetchOne<RecorderRole>("").value_or(RecorderRole{});
+std::string RecorderName(const base::Installation& installation) {
+    std::array<char, 256> host{};
+    ::gethostname(host.data(), host.size() - 1);
+    return installation.Home().string() + " on " + host.data();
 }
 
-bool RecorderLease::Take(std::int64_t count, const std::string& holder, int first_own_id) {
+LeaseState RecorderLease::Current() {
+    return connection_.FetchOne<LeaseState>("").value_or(LeaseState{});
+}
+
+bool RecorderLease::Take(std::int64_t count, const std::string& holder, int first_reserved_id) {
     return connection_.Write(
         [&](soci::session& sql) {
             return Execute(sql,
-                           "update recorder_lease set count = count + 1, holder = :holder, first_own_id = :first"
+                           "update recorder_lease set count = count + 1, holder = :holder, first_reserved_id = :first"
                            " where count = :count",
-                           holder, first_own_id, count) > 0;
+                           holder, first_reserved_id, count) > 0;
         },
         Durability::kLazy);
 }

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder's role in the store: only its holder records the store's cameras, whatever hosts share the store.
+// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever hosts share the store.
 //
 // Why so        Two recorders on one store would record every camera twice. The clocks of two hosts cannot be compared,
-//               so the holder counts up, and others take the role over once the count has stood still for a while by
+//               so the holder counts up, and others take the lease over once the count has not changed for a while by
 //               their own clock.
 #pragma once
 
@@ -11,26 +11,30 @@
 #include <optional>
 #include <string>
 
+#include "standalone/base/installation.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::store {
 
-struct RecorderRole {
-    std::string holder;      // empty while nobody has had it
-    std::int64_t count = 0;  // grows whenever the holder renews it
-    int first_own_id = 0;    // event ids from here on may be in the holder's reserve
+struct LeaseState {
+    std::string holder;         // empty while nobody has had it
+    std::int64_t count = 0;     // grows whenever the holder renews it
+    int first_reserved_id = 0;  // event ids from here on may be in the holder's reserve
 
-    friend bool operator==(const RecorderRole&, const RecorderRole&) = default;
+    friend bool operator==(const LeaseState&, const LeaseState&) = default;
 };
+
+// The holder's name, "/var/lib/lookhaven on nvr1": the same after a restart, another on each host.
+std::string RecorderName(const base::Installation& installation);
 
 class RecorderLease {
   public:
     // The store must outlive this object.
     explicit RecorderLease(Store& store) : connection_(store.connection()) {}
 
-    RecorderRole Current();
-    // Takes or renews the role if its count is still that one. False when somebody else was faster.
-    bool Take(std::int64_t count, const std::string& holder, int first_own_id);
+    LeaseState Current();
+    // Takes or renews the lease if its count is still that one. False when somebody else was faster.
+    bool Take(std::int64_t count, const std::string& holder, int first_reserved_id);
 
   private:
     Connection& connection_;

@@ -120,9 +120,9 @@ constexpr const char* kReporters[] = {
     "create index marks_by_reporter on marks (reporter_id, reported_s) where reporter_id <> 0",
 };
 
-constexpr const char* kDisks[] = {
+constexpr const char* kRecordingOrder[] = {
     // Rows whose files retention is removing: out of every search, and restored where a file cannot be removed.
-    "create table events_in_removal (id integer not null primary key, camera_id integer not null,"
+    "create table events_pending_deletion (id integer not null primary key, camera_id integer not null,"
     " mount_id integer not null, start_s bigint not null, end_s bigint not null, recording integer not null,"
     " reason integer not null, frame_count integer not null, size_bytes bigint not null, video_type integer not null,"
     " audio_codec text not null, width integer not null, height integer not null, path text not null,"
@@ -134,12 +134,12 @@ constexpr const char* kDisks[] = {
     " where recording = 0 and archived = 0 and demo = 0",
 
     "create table recorder_lease (count bigint not null primary key, holder text not null,"
-    " first_own_id integer not null)",
-    "insert into recorder_lease (count, holder, first_own_id) values (0, '', 2147483647)",
+    " first_reserved_id integer not null)",
+    "insert into recorder_lease (count, holder, first_reserved_id) values (0, '', 2147483647)",
 };
 
 // Before this version certificates were not verified: existing HTTPS cameras keep working, marked insecure.
-constexpr const char* kVerifiedCameras[] = {
+constexpr const char* kInsecureCameras[] = {
     "alter table cameras add column insecure integer not null default 0",
     "update cameras set insecure = 1 where id in (select camera_id from camera_profiles where source like 'https:%')",
 };
@@ -149,8 +149,8 @@ constexpr Migration kMigrations[] = {
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
     {"e-maps, their devices, recording servers", kEmaps},
     {"who reported a mark, and who may", kReporters},
-    {"events in removal, the order of recording, the recorder's role", kDisks},
-    {"cameras whose HTTPS certificate is not verified", kVerifiedCameras},
+    {"events pending deletion, the order of recording, the recorder lease", kRecordingOrder},
+    {"cameras whose HTTPS certificate is not verified", kInsecureCameras},
 };
 
 }  // namespace

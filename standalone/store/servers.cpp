@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/servers.h"
 
+#include "standalone/base/text.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/text.h"
 
@@ -72,7 +73,7 @@ void RequireValid(soci::session& sql, const RecordingServer& server) {
 }
 
 void RequireSecret(const std::string& secret) {
-    if (!IsHex(secret, kSecretDigits)) {
+    if (!base::IsHex(secret, kSecretDigits)) {
         throw InvalidRecord("the secret of two hosts is 64 hexadecimal digits");
     }
 }

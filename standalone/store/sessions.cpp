@@ -4,9 +4,9 @@
 #include <algorithm>
 #include <set>
 
+#include "standalone/base/text.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/secret.h"
-#include "standalone/store/text.h"
 
 namespace lookhaven::store {
 
@@ -62,7 +62,7 @@ NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::
 }
 
 std::optional<Session> Sessions::FindBySecret(std::string_view secret, std::int64_t now_s) {
-    if (!IsHex(secret, 2 * kSecretBytes)) {
+    if (!base::IsHex(secret, 2 * kSecretBytes)) {
         return std::nullopt;
     }
     return connection_.FetchOne<Session>("where secret_hash = :hash and expires > :now", Digest(secret), now_s);
@@ -77,7 +77,7 @@ bool Sessions::Touch(const Session& session, std::int64_t now_s) {
 }
 
 bool Sessions::End(std::string_view handle) {
-    return IsHex(handle, 2 * kHandleBytes) &&
+    return base::IsHex(handle, 2 * kHandleBytes) &&
            connection_.Execute("delete from sessions where handle = :handle", std::string(handle)) > 0;
 }
 

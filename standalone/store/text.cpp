@@ -63,10 +63,4 @@ bool IsSource(std::string_view source) {
            (host.empty() || source.find_first_of(" \\") == source.npos);
 }
 
-bool IsHex(std::string_view text, std::size_t digits) {
-    return text.size() == digits && std::all_of(text.begin(), text.end(), [](char c) {
-               return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f');
-           });
-}
-
 }  // namespace lookhaven::store

@@ -20,6 +20,4 @@ bool IsReservedName(std::string_view name);
 // The form of a stream's address: "<scheme>:<rest>", without account and password before its host. Any scheme will do.
 bool IsSource(std::string_view source);
 
-bool IsHex(std::string_view text, std::size_t digits);
-
 }  // namespace lookhaven::store

@@ -10,8 +10,8 @@
 #include <CLI/CLI.hpp>
 #include <sysexits.h>
 
+#include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/modules.h"
-#include "standalone/api/picture_filter.h"
 #include "standalone/api/serve.h"
 #include "standalone/api/session_watcher.h"
 #include "standalone/base/installation.h"
@@ -65,7 +65,7 @@ void Describe(CLI::App& app, Options& options) {
 void KeepSome(Options& options) {
     const std::size_t requests = options.limits.requests;
     options.limits.kept_for_log_in = requests / 32;
-    options.requests.but_managers = requests - requests / 32 - requests / 16;
+    options.requests.without_managers = requests - requests / 32 - requests / 16;
 }
 
 void Run(const Options& options) {
@@ -78,7 +78,7 @@ void Run(const Options& options) {
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
-    const api::Service service{installation, modules, options.requests, api::FilterOfPlayers()};
+    const api::Service service{installation, modules, options.requests, api::PlaybackFilter()};
     const host::ChildWork work{
         .serve_request = [&service](http::Request& request, control::SlotTable& slots,
                                     control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },

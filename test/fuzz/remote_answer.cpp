@@ -14,7 +14,7 @@
 #include "standalone/cli/console.h"
 #include "standalone/cli/pair_text.h"
 #include "standalone/remote/certificate.h"
-#include "standalone/remote/library.h"
+#include "standalone/remote/transfer.h"
 #include "test/fuzz/fuzz.h"
 
 using namespace lookhaven;

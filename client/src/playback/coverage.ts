@@ -35,7 +35,7 @@ export function kindOf({ kind, reason }: Pick<Footage, "kind" | "reason">): Even
   return reason === kReasonContinuous ? "continuous" : "alarm";
 }
 
-/** What touches the span. Marks lie within recordings, so that ends do not ascend with starts. */
-export function touching(footage: readonly Footage[], fromS: number, toS: number): Footage[] {
+/** What overlaps the span. Marks lie within recordings, so that ends do not ascend with starts. */
+export function overlapping(footage: readonly Footage[], fromS: number, toS: number): Footage[] {
   return footage.filter(({ start, stop }) => start < toS && stop > fromS);
 }

@@ -14,17 +14,7 @@ import { newStreamKey, type Footage, type Recordings, type Start } from "../wire
 import { ServerError } from "../wire/server";
 import { FrameClock } from "./frame_clock";
 import { readFrames, type RecordedFrame } from "./frame_stream";
-
-export type PlayerState =
-  /** There is nothing to play. */
-  | { kind: "empty" }
-  | { kind: "opening" | "playing" | "paused" | "ended" }
-  /** The server ended the stream before its end: another player of this session has taken over. */
-  | { kind: "preempted" }
-  | { kind: "failed"; reason: string };
-
-/** Below 0 slow motion by that factor; n above 1 shows every n-th frame. */
-export const kRates = [-8, -4, -2, 1, 2, 4, 8, 16] as const;
+import type { PlayerState } from "./player_state";
 
 const kTailDelayMs = 1_000;
 /** The server waits longer for what is still being recorded, and not at all when another player takes over. */
@@ -33,7 +23,7 @@ const kTailSilenceMs = 1_500;
 const kExactUntilMs = 1_000;
 const kCannotPlay = 200;
 /** A frame is decoded from the key frame before it on, so a step back keeps this many that are passed for the next steps. */
-const kKeptFrames = 12;
+const kStepBackFrames = 12;
 
 export class Player {
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
@@ -116,7 +106,7 @@ export class Player {
     const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.#index;
     const last = this.#footage.isGrowing || !this.#footage.frameCount ? Infinity : this.#footage.frameCount - 1;
     const index = Math.max(0, Math.min(from + by, last));
-    const start: Start = by < 0 ? { index, from: Math.max(0, index - kKeptFrames + 1) } : { index };
+    const start: Start = by < 0 ? { index, from: Math.max(0, index - kStepBackFrames + 1) } : { index };
     if (index !== this.#index || this.#state.kind !== "paused") this.#showStill(start);
   }
 

@@ -2,7 +2,7 @@
 //
 // Segments out of the recording log's run lengths.
 
-import { segmentsOf, touching } from "../../../client/src/playback/coverage";
+import { segmentsOf, overlapping } from "../../../client/src/playback/coverage";
 import type { Footage, Runs } from "../../../client/src/wire/recordings";
 
 test.each<[string, Runs, [number, number, boolean][]]>([
@@ -16,5 +16,5 @@ test.each<[string, Runs, [number, number, boolean][]]>([
 
 test("a recording is on the screen however many marks within it have ended before", () => {
   const footage = [[0, 100], ...Array.from({ length: 20 }, (_, at) => [10 + at, 11 + at])].map(([start, stop]) => ({ start, stop }) as Footage);
-  expect(touching(footage, 50, 60)).toEqual([footage[0]]);
+  expect(overlapping(footage, 50, 60)).toEqual([footage[0]]);
 });

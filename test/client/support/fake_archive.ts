@@ -56,7 +56,7 @@ export class FakeArchive {
       case "VEXO.Lookhaven.Player SearchAvaiDate":
         return json({ search_time: number("start"), available_day: this.#days(query) });
       case "VEXO.Event List":
-        return json({ event: idsOf(query).flatMap((camera) => this.#touching(camera, number("from"), number("to"), true).map(rawMark)) });
+        return json({ event: idsOf(query).flatMap((camera) => this.#overlapping(camera, number("from"), number("to"), true).map(rawMark)) });
       case "VEXO.Event Get": {
         const kind = query.get("kind") ?? "event";
         const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
@@ -77,13 +77,13 @@ export class FakeArchive {
     }
   }
 
-  #touching(camera: number, from: number, to: number, isMark: boolean): Recorded[] {
+  #overlapping(camera: number, from: number, to: number, isMark: boolean): Recorded[] {
     const isWanted = (one: Recorded) => one.camera === camera && (one.kind ?? "event") !== "event" === isMark;
     return this.recorded.filter((one) => isWanted(one) && one.start < to && one.stop > from);
   }
 
   #history(camera: number, from: number, to: number, interval: number) {
-    const events = this.#touching(camera, from, to, false);
+    const events = this.#overlapping(camera, from, to, false);
     const steps = Array.from({ length: Math.ceil((to - from) / interval) }, (_, step) => {
       const at = from + step * interval;
       return events.some(({ start, stop }) => start < at + interval && stop > at) ? 2 : 0;
@@ -99,7 +99,7 @@ export class FakeArchive {
   #days(query: URLSearchParams): number[] {
     return Array.from({ length: Number(query.get("day_count")) }, (_, day) => {
       const from = Number(query.get("start")) + day * 86_400;
-      return idsOf(query).some((camera) => this.#touching(camera, from, from + 86_400, false).length > 0) ? 1 : 0;
+      return idsOf(query).some((camera) => this.#overlapping(camera, from, from + 86_400, false).length > 0) ? 1 : 0;
     });
   }
 

@@ -11,8 +11,8 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/remote/pair_token.h"
 #include "standalone/store/connection.h"
-#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/users.h"
@@ -113,14 +113,14 @@ TEST(Peers, AreOneUserTogether) {
     const std::string now = std::to_string(base::WallSeconds());
     std::vector<base::FileDescriptor> running;
     const auto open = [&](const std::string& secret) {
-        return host.OpenQuery("api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=PeerStream&timestamp=" + now +
-                                  "&cookie=" + store::MakePairToken(secret, now),
+        return host.OpenQuery("api=VEXO.Lookhaven.Player.LiveviewSrc&version=1&method=PairedStream&timestamp=" + now +
+                                  "&cookie=" + remote::MakePairToken(secret, now),
                               "");
     };
-    store::RecordingServer peer;
+    store::RecordingServer other;
     for (const std::string& secret : {std::string(64, 'a'), std::string(64, 'b')}) {
-        peer.name = "Peer " + secret.substr(0, 1);
-        store::RecordingServers(records).Add(peer, secret);
+        other.name = "Host " + secret.substr(0, 1);
+        store::RecordingServers(records).Add(other, secret);
         running.push_back(open(secret));
     }
     ASSERT_TRUE(host::Eventually(std::chrono::seconds(2), [&] { return host.RequestProcesses() == 2; }));
@@ -130,9 +130,9 @@ TEST(Peers, AreOneUserTogether) {
     }
     EXPECT_EQ(HostUnderTest::ReadAnswer(open(std::string(64, 'b'))).status, 503);
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
-    peer = *store::RecordingServers(records).Find(1);
-    peer.enabled = false;
-    store::RecordingServers(records).Update(peer);
+    other = *store::RecordingServers(records).Find(1);
+    other.enabled = false;
+    store::RecordingServers(records).Update(other);
     EXPECT_TRUE(host::Eventually(std::chrono::seconds(2), [&] { return host.RequestProcesses() == 1; }))
         << "one of two goes on: its pairing does";
 }

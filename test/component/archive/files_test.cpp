@@ -9,7 +9,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "standalone/archive/file.h"
+#include "standalone/archive/mount_file.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/archive/recording_reader.h"
 #include "standalone/archive/repair.h"

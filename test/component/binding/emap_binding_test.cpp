@@ -14,8 +14,8 @@
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/rights.h"
 #include "standalone/emap/pictures.h"
+#include "standalone/remote/pair_token.h"
 #include "standalone/store/devices.h"
-#include "standalone/store/pair_token.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/settings.h"
 #include "test/component/binding/binding_fixture.h"
@@ -206,7 +206,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     const std::string timestamp = cookie.substr(0, cookie.find('-'));
     EXPECT_EQ(cookie.find(kSecret), std::string::npos);
     const std::string token = cookie.substr(timestamp.size() + 1);
-    EXPECT_EQ(token, store::MakePairToken(kSecret, timestamp));
+    EXPECT_EQ(token, remote::MakePairToken(kSecret, timestamp));
     EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "what is shown to another host opens nothing here";
     for (const unsigned int caller : {2U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
         Call(caller);
@@ -215,17 +215,17 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     Call(1);
     EXPECT_FALSE(IsAuthPairMatch("FailedCookie", "FailedTiemstamp"));
     EXPECT_FALSE(
-        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
+        SlaveHxAuthentication().IsAuthByPairMatch(remote::MakePairToken(std::string(64, 'e'), timestamp), timestamp));
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
     EXPECT_TRUE(
-        SlaveHxAuthentication().IsAuthByPairMatch(store::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
-    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the peer";
+        SlaveHxAuthentication().IsAuthByPairMatch(remote::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
+    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the paired host";
 }
 
 TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
     constexpr std::int64_t kNow = 1'800'000'000;
     const std::string now = "1800000000";
-    const std::string token = store::MakePairToken(kSecret, now);
+    const std::string token = remote::MakePairToken(kSecret, now);
     std::string flipped = token;
     flipped.back() = flipped.back() == '0' ? '1' : '0';
     const struct {
@@ -243,15 +243,15 @@ TEST(PairToken, MatchesOnlyItsSecretItsTimestampAndItsTime) {
                 {token.substr(1), now, kSecret, kNow, false},
                 {token, now, "", kNow, false},
                 {"FailedCookie", "FailedTiemstamp", kSecret, kNow, false},
-                {store::MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
-                {store::MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
-                {store::MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
-                {store::MakePairToken(kSecret, ""), "", kSecret, 0, false}};
+                {remote::MakePairToken(kSecret, "FailedTiemstamp"), "FailedTiemstamp", kSecret, kNow, false},
+                {remote::MakePairToken(kSecret, "+1800000000"), "+1800000000", kSecret, kNow, false},
+                {remote::MakePairToken(kSecret, "99999999999999999999"), "99999999999999999999", kSecret, kNow, false},
+                {remote::MakePairToken(kSecret, ""), "", kSecret, 0, false}};
     for (const auto& row : rows) {
-        EXPECT_EQ(store::PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
+        EXPECT_EQ(remote::PairTokenMatches(row.token, row.timestamp, row.secret, row.at), row.matches)
             << row.timestamp << " at " << row.at;
     }
-    EXPECT_THROW(store::MakePairToken("", now), std::invalid_argument);
+    EXPECT_THROW(remote::MakePairToken("", now), std::invalid_argument);
 }
 
 }  // namespace

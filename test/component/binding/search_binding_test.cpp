@@ -32,8 +32,8 @@ TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
     } cases[] = {{"one who may", 1, {}, true},
                  {"one who may not", 2, {}, false},
                  {"nobody", 0, {}, false},
-                 {"a peer", PAIR_AUTH_UID, {}, true},
-                 {"a peer narrowed", PAIR_AUTH_UID, {2}, false},
+                 {"a paired host", PAIR_AUTH_UID, {}, true},
+                 {"a paired host narrowed", PAIR_AUTH_UID, {2}, false},
                  {"one who renounces it", 1, {2}, false},
                  {"an account that is gone", 77, {}, false}};
     for (const auto& each : cases) {

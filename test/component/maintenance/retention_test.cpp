@@ -17,8 +17,6 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/base/installation.h"
-#include "standalone/maintenance/clock_watch.h"
-#include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/marks.h"
@@ -38,7 +36,7 @@ constexpr std::int64_t kNow = kNoon + 86400;
 
 class RetentionTest : public testing::Test {
   protected:
-    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkOf(footage_.Records(), footage_.MountId())); }
+    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId())); }
 
     RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
@@ -93,7 +91,7 @@ TEST_F(RetentionTest, TheOldestGoWhereNoFileCouldBeMade) {
         ::mount("tmpfs", mount, "tmpfs", 0, "size=1g,nr_inodes=500") != 0) {
         GTEST_SKIP() << "only root can make a file system of few files";
     }
-    const MountMark mark = MarkOf(footage_.Records(), footage_.MountId());
+    const MountMarker mark = MarkerFor(footage_.Records(), footage_.MountId());
     MountFolder::WriteMarker(footage_.Mount(), mark);
     footage_.Record(1, kNoon, 60);
     const int second = footage_.Record(1, kNoon + 60, 60);
@@ -130,24 +128,6 @@ TEST_F(RetentionTest, AWrongDateNeitherDeletesNorKeeps) {
     EXPECT_THAT(Left(), ElementsAre(young, past));
     EXPECT_EQ(Run(kEventBytes).events, 1);
     EXPECT_THAT(Left(), ElementsAre(past)) << "recorded last";
-}
-
-TEST(ClockWatch, TrustsAnHourWithoutAStepOfADay) {
-    ClockWatch watch;
-    constexpr std::int64_t kHourUs = std::int64_t{3600} * 1'000'000;
-    const struct {
-        std::int64_t monotonic_us, wall_s;
-        bool is_trusted;
-    } rows[] = {{5, 1000, false},
-                {5 + kHourUs - 1, 4599, false},
-                {5 + kHourUs, 4600, true},
-                {5 + kHourUs, 4600 + 86'000, true},  // put right
-                {6 + kHourUs, kNoon, false},
-                {6 + 2 * kHourUs, kNoon + 3600, true},
-                {7 + 2 * kHourUs, 0, false}};
-    for (const auto& row : rows) {
-        EXPECT_EQ(watch.IsTrusted(row.monotonic_us, row.wall_s), row.is_trusted) << row.monotonic_us;
-    }
 }
 
 TEST_F(RetentionTest, WhatIsKeptOnPurposeOrUnknownStays) {
@@ -196,16 +176,16 @@ TEST_F(RetentionTest, AnEventWhoseFileCannotBeRemovedKeepsItsRow) {
     EXPECT_EQ(Run(1).events, 2);
 }
 
-TEST_F(RetentionTest, WhatACrashLeftInRemovalIsFinished) {
+TEST_F(RetentionTest, ADeletionThatACrashInterruptedIsFinished) {
     const int first = footage_.Record(1, kNoon, 60);
     const int second = footage_.Record(1, kNoon + 60, 60);
     const fs::path file = footage_.FileOf(second);
     fs::remove(footage_.FileOf(first));
     store::Events events(footage_.Records());
-    events.BeginRemoval(std::array{first, second});
+    events.BeginDeletion(std::array{first, second});
     EXPECT_THAT(Verify(footage_.Records(), false).faults, IsEmpty());
     EXPECT_EQ(Run(0).events, 2);
-    EXPECT_FALSE(fs::exists(file) || !events.InRemoval(footage_.MountId()).empty());
+    EXPECT_FALSE(fs::exists(file) || !events.PendingDeletion(footage_.MountId()).empty());
 }
 
 // Root may pass every permission: takes that away until destruction.
@@ -254,31 +234,6 @@ TEST_F(RetentionTest, MarksThatArchivedFootageKeepsHideNoOther) {
     }
     footage_.Mark(1, 1, kNoon + 80, 5, "gone", plain);
     EXPECT_EQ(Run(1).marks, 1);
-}
-
-TEST_F(RetentionTest, AMarkIsCompleteOnceNoRowOfItCanCome) {
-    const int event = footage_.Record(1, kNoon, 60);
-    store::Marks marks(footage_.Records());
-    const auto add = [&](int camera, std::int64_t at_s) {
-        return marks.Add(store::MarkKind::kAlert, camera, at_s, 1, "").id;
-    };
-    const int whole = add(1, kNoon + 30);
-    const int partly = add(1, kNoon + 58);  // its row ends before it
-    const int none = add(2, kNoon + 30);
-    bool ended = false;
-    const auto complete = [&] {
-        for (const int mount : {footage_.MountId(), 0}) {
-            CompleteMarks(footage_.Records(), mount, kNow, [&](const store::Mark&) { return ended; });
-        }
-        std::string states;
-        for (const int id : {whole, partly, none}) {
-            states += std::string(NameOf(marks.Find(store::MarkKind::kAlert, id)->state)) + " ";
-        }
-        return states;
-    };
-    EXPECT_EQ(complete(), "saved pending pending ") << event;
-    ended = true;
-    EXPECT_EQ(complete(), "saved saved missed ");
 }
 
 TEST_F(RetentionTest, APathThatLeadsAwayRemovesNothing) {

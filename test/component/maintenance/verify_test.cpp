@@ -33,7 +33,7 @@ class VerifyTest : public testing::Test {
   protected:
     // An installation with one recording, its row and an alert over it.
     VerifyTest() {
-        MountFolder::WriteMarker(footage_.Mount(), MarkOf(footage_.Records(), footage_.MountId()));
+        MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId()));
         event_ = footage_.Record(1, kStartS, 4);
         file_ = footage_.FileOf(event_);
         fs::remove(file_);
@@ -198,9 +198,8 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     }
     fs::create_directory(footage_.Mount() / "12");
     Age();
-    for (const Fault& fault : Verify(Records(), true).faults) {
-        EXPECT_THAT(fault.done, HasSubstr("adopted"));
-    }
+    EXPECT_THAT(Verify(Records(), true).faults,
+                testing::AllOf(testing::SizeIs(2), testing::Each(testing::Field(&Fault::done, HasSubstr("adopted")))));
     EXPECT_FALSE(fs::exists(taken) || fs::exists(in_reserve) || events.Find(reserved));
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
     store::Camera camera;

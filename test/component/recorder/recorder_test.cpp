@@ -233,7 +233,7 @@ TEST_F(RecorderTest, ThatHangsIsToldAsHangingAndLogsTheLostTime) {
     EXPECT_TRUE(is(control::RecorderState::kHangs));
     recorder.Signal(SIGCONT);
     EXPECT_TRUE(is(control::RecorderState::kAlive));
-    EXPECT_EQ(LogLines("the recorder stood still for "), 1u);
+    EXPECT_EQ(LogLines("the recorder did not run for "), 1u);
 }
 
 TEST_F(RecorderTest, SecondRecorderOfAnInstallationLeaves) {

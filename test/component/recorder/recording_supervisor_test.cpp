@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maintenance of several mounts, one of which fails; a disk that hangs; and two recorders on one store.
+// Maintenance of several mounts, one of which fails.
 #include "standalone/recorder/recording_supervisor.h"
-
-#include <future>
 
 #include <gtest/gtest.h>
 
@@ -17,23 +15,6 @@ namespace lookhaven::recorder {
 namespace {
 
 namespace fs = std::filesystem;
-
-TEST(RecordingReport, HoldsNobodyUpWhileTheDiskHangs) {
-    std::promise<void> disk;
-    std::vector<std::size_t> written;
-    RecordingReport report([&, ready = disk.get_future().share()](const RecordingReport::States& states) {
-        ready.wait();
-        written.push_back(states.cameras.size());
-    });
-    for (const std::size_t cameras : {1U, 1U, 2U, 3U}) {
-        report.Publish({std::vector<maintenance::RecordingStatus>(cameras), {}});
-    }
-    report.RequestStop();
-    EXPECT_FALSE(report.HasEnded()) << "it waits for the disk in its own thread";
-    disk.set_value();
-    ASSERT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return report.HasEnded(); }));
-    EXPECT_EQ(written.back(), 3U);
-}
 
 class RecordingSupervisorTest : public testing::Test {
   protected:
@@ -62,7 +43,7 @@ class RecordingSupervisorTest : public testing::Test {
 };
 
 TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
-    const std::string own = maintenance::MarkOf(store_, 1).installation;
+    const std::string own = maintenance::MarkerFor(store_, 1).installation;
     const int failing = AddMount(home_ / "failing", own);
     const int foreign = AddMount(home_ / "foreign", "somebody else's");
     const int copied = AddMount(home_ / "copied", own);
@@ -110,23 +91,6 @@ TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
         << "recovery is tried again";
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
-}
-
-TEST_F(RecordingSupervisorTest, OneRecorderAtATimeHoldsAStore) {
-    std::int64_t now_us = 0;
-    RecorderRole first("A", [&] { return now_us; });
-    RecorderRole second("B", [&] { return now_us; });
-    for (; now_us < 10 * RecorderRole::kExpiryUs; now_us += RecorderRole::kRenewUs) {
-        EXPECT_TRUE(first.Hold(store_, 1));
-        EXPECT_FALSE(second.Hold(store_, 1));
-    }
-    EXPECT_TRUE(RecorderRole("A", [&] { return now_us; }).Hold(store_, 7)) << "started again";
-    EXPECT_EQ(store::RecorderLease(store_).Current().first_own_id, 7);
-    now_us += RecorderRole::kRenewUs;
-    EXPECT_FALSE(first.Hold(store_, 1));
-    EXPECT_FALSE(second.Hold(store_, 1));
-    now_us += RecorderRole::kExpiryUs;
-    EXPECT_TRUE(second.Hold(store_, 1)) << "nobody renews it";
 }
 
 }  // namespace

@@ -54,7 +54,7 @@ class RecordingTest : public RecorderTest, public testing::WithParamInterface<st
 
     void Mark(int mount) const {
         store::Store store = Store();
-        maintenance::MountFolder::WriteMarker(Folder(), maintenance::MarkOf(store, mount));
+        maintenance::MountFolder::WriteMarker(Folder(), maintenance::MarkerFor(store, mount));
     }
 
     ~RecordingTest() override { ::umount2(Folder().c_str(), MNT_DETACH); }  // where there is a small disk

@@ -277,28 +277,5 @@ TEST_F(LifecycleTest, OnlyOrphansAreRemoved) {
     EXPECT_EQ(left[0].attached, 1U);
 }
 
-TEST(GeometryTest, ARingHoldsAGroupOfPicturesOrThreeSecondsOfPictures) {
-    struct Row {
-        StreamEstimate estimate;
-        std::uint64_t min_bytes;
-        std::uint64_t max_bytes;
-        std::uint32_t min_slots;
-    };
-    for (const Row& row : {
-             Row{{Medium::kVideo, true, 200'000LL * 8 * 25, 200'000, 25}, 15'000'000, 34'000'000, 75},
-             Row{{Medium::kVideo, false, 4'000'000, 200'000, 25}, 5'000'000, 17'000'000, 250},
-             Row{{Medium::kVideo, false, 0, 0, 0}, 4'000'000, 17'000'000, 250},
-             Row{{Medium::kVideo, false, 100'000, 4'000'000, 5}, 64'000'000, 135'000'000, 50},
-             Row{{Medium::kAudio, true, 64'000, 0, 0}, 24'000, 140'000, 128},
-             Row{{Medium::kVideo, true, std::int64_t{1} << 60, std::int64_t{1} << 60, 1e9}, 1 << 28, 1 << 28, 8'192},
-         }) {
-        const Geometry geometry = GeometryFor(row.estimate);
-        EXPECT_GE(geometry.arena_bytes, row.min_bytes);
-        EXPECT_LE(geometry.arena_bytes, row.max_bytes);
-        EXPECT_GE(geometry.index_slots, row.min_slots);
-        EXPECT_LE(geometry.index_slots, 8'192U);
-    }
-}
-
 }  // namespace
 }  // namespace lookhaven::ring

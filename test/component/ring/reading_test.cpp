@@ -71,7 +71,7 @@ class ReadingTest : public RingTest {
     Position position_;
     std::optional<Writer> sound_writer_;
     Position sound_position_;
-    Companion sound_;
+    SecondReader sound_;
     std::uint64_t written_ = 0;
 };
 
@@ -296,38 +296,6 @@ TEST_F(ReadingTest, AForkedChildReadsNothingThroughItsParentsPositionAndLeavesIt
         ASSERT_TRUE(Write(9'000));
     }
     EXPECT_TRUE(IsFilled(*held, 1));
-}
-
-TEST_F(ReadingTest, FramesAndFormatsAreTakenWithinTheirBounds) {
-    Open(kVideo, {std::string(40, 'c'), std::vector<unsigned char>(1025), 1, 2, true}, kSmall);
-    EXPECT_EQ(std::string(Codec(ring_)), std::string(31, 'c'));
-    EXPECT_TRUE(ExtraData(ring_).empty());
-    struct Row {
-        std::size_t size_bytes;
-        int offset;
-        bool expected;
-    };
-    for (const Row& row : {Row{0, 0, false}, Row{1, 0, true}, Row{10, 9, true}, Row{10, 10, false}, Row{10, -1, false},
-                           Row{4194303, 0, true}, Row{4194304, 0, false}}) {
-        const auto data = MakeData(row.size_bytes, 1);
-        EXPECT_EQ(writer_->Write({.data = data, .offset = row.offset}), row.expected)
-            << row.size_bytes << " bytes, offset " << row.offset;
-    }
-    const Entry* largest = ReadLatest(writer_->Address());
-    ASSERT_NE(largest, nullptr);
-    EXPECT_TRUE(IsFilled(*largest, 1));
-    StopRead(writer_->Address(), nullptr);
-
-    writer_->SetFormat({"H264", std::vector<unsigned char>(1024, 9), 640, 360, false});
-    EXPECT_THAT(ExtraData(writer_->Address()), testing::AllOf(testing::SizeIs(1024), testing::Each(9)));
-    EXPECT_EQ(Width(writer_->Address()) * 1000 + Height(writer_->Address()), 640'360);
-
-    void* silence = AttachEmpty(kAudio, {"AAC", {7}, 0, 0, true});
-    EXPECT_STREQ(Codec(silence), "AAC");
-    Position position;
-    StartRead(silence, &position);
-    EXPECT_EQ(ReadNext(silence, kNoSequence, &position), nullptr);
-    EXPECT_EQ(::shmdt(silence), 0);
 }
 
 }  // namespace

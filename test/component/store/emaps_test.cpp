@@ -173,11 +173,11 @@ TEST_P(EmapTest, AStateIsOneThatTheDeviceHasAndKnowsSinceWhen) {
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
     EXPECT_THAT(servers_.SecretsOfPairedHosts(), IsEmpty()) << "a server that this host connects to";
-    RecordingServer peer{.name = "Connects to this host"};
-    peer.id = servers_.Add(peer, kSecret);
+    RecordingServer connecting{.name = "Connects to this host"};
+    connecting.id = servers_.Add(connecting, kSecret);
     EXPECT_THAT(servers_.SecretsOfPairedHosts(), ElementsAre(kSecret));
-    peer.enabled = false;
-    servers_.Update(peer);
+    connecting.enabled = false;
+    servers_.Update(connecting);
     EXPECT_THAT(servers_.SecretsOfPairedHosts(), IsEmpty()) << "disabled";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;

@@ -140,7 +140,7 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         EXPECT_EQ(visited, rows) << mount;
         std::erase_if(rows, [](const Event& event) { return event.recording || event.archived; });
         std::ranges::sort(rows, {}, &Event::id);
-        EXPECT_EQ(events_.Oldest(mount, 0, 1000), rows) << mount;
+        EXPECT_EQ(events_.InRecordingOrder(mount, 0, 1000), rows) << mount;
     }
     const auto demo = std::ranges::count_if(all, &Event::demo);
     EXPECT_EQ(events_.RemoveDemo(), demo);
@@ -156,9 +156,9 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     events_.Begin(event);
     EXPECT_THROW(events_.Begin(event), AlreadyExists);
     EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
-    EXPECT_THAT(events_.Oldest(event.mount_id, 0, 1), IsEmpty()) << "retention leaves an open one alone";
-    events_.BeginRemoval(std::array{event.id});
-    EXPECT_THAT(events_.InRemoval(event.mount_id), IsEmpty());
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, 0, 1), IsEmpty()) << "retention leaves an open one alone";
+    events_.BeginDeletion(std::array{event.id});
+    EXPECT_THAT(events_.PendingDeletion(event.mount_id), IsEmpty());
     EXPECT_TRUE(events_.Grow(event.id, event.start_s + 1, 25, 5'000'000'000));
     store_.connection().Read([&](soci::session& sql) {
         const bool sqlite = GetParam() == Engine::kSqlite;
@@ -172,16 +172,16 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THROW(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds + 1, 25, 1), InvalidRecord);
     EXPECT_TRUE(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds, 50, 6));
     EXPECT_THAT(events_.Open(), IsEmpty());
-    EXPECT_THAT(Ids(events_.Oldest(event.mount_id, 0, 1)), ElementsAre(event.id));
-    EXPECT_THAT(events_.Oldest(event.mount_id, event.id, 1), IsEmpty());
+    EXPECT_THAT(Ids(events_.InRecordingOrder(event.mount_id, 0, 1)), ElementsAre(event.id));
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, event.id, 1), IsEmpty());
     const Event finished = *events_.Find(event.id);
-    events_.BeginRemoval(std::array{event.id});
+    events_.BeginDeletion(std::array{event.id});
     EXPECT_FALSE(events_.Find(event.id) || events_.Content(event.mount_id).events > 0);
-    EXPECT_THAT(events_.InRemoval(event.mount_id), ElementsAre(finished));
-    events_.CancelRemoval(std::array{event.id});
+    EXPECT_THAT(events_.PendingDeletion(event.mount_id), ElementsAre(finished));
+    events_.CancelDeletion(std::array{event.id});
     EXPECT_EQ(events_.Find(event.id), finished);
     EXPECT_TRUE(events_.SetArchived(event.id, true));
-    EXPECT_THAT(events_.Oldest(event.mount_id, 0, 1), IsEmpty());
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, 0, 1), IsEmpty());
     const int unknown = events_.NextId();
     EXPECT_GT(unknown, event.id);
     EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1) ||

@@ -173,7 +173,7 @@ const Row kTable[] = {
     {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Nothing},
     {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", EmptyStream},
     {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Success", Success},
-    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "PeerStream",
+    {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "PairedStream",
      [](APIRequest* request, APIResponse*) {
          const auto given = [request](const char* name) { return request->GetParam(name, "").asString(); };
          if (IsAuthPairMatch(given("cookie"), given("timestamp"))) {

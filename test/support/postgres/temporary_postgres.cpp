@@ -16,9 +16,9 @@ namespace {
 
 constexpr std::chrono::seconds kStartDeadline{60};
 
-// PostgreSQL refuses to run as root. The guardian has a session of its own, so that Ctrl-C reaches the test alone; it stops
+// PostgreSQL refuses to run as root. The watchdog has a session of its own, so that Ctrl-C reaches the test alone; it stops
 // the server and removes the folder when its input ends.
-constexpr const char* kGuardian = R"sh(exec setsid sh -c '
+constexpr const char* kWatchdog = R"sh(exec setsid sh -c '
     cd "$0" && exec >log 2>&1
     as= programs=/usr/lib/postgresql/15/bin
     [ "$(id -u)" != 0 ] || { chown postgres . && as="setpriv --reuid postgres --regid postgres --init-groups"; }
@@ -44,7 +44,7 @@ std::string ReadAll(const std::filesystem::path& path) {
 TemporaryPostgres::TemporaryPostgres() {
     std::string pattern = std::filesystem::temp_directory_path() / "lookhaven-postgres-XXXXXX";
     folder_ = ::mkdtemp(pattern.data());
-    guardian_.reset(::popen((kGuardian + folder_.string()).c_str(), "we"));
+    watchdog_.reset(::popen((kWatchdog + folder_.string()).c_str(), "we"));
     const auto deadline = std::chrono::steady_clock::now() + kStartDeadline;
     while (ReadAll(folder_ / "data" / "postmaster.pid").find("ready") == std::string::npos) {
         if (std::filesystem::exists(folder_ / "failed") || std::chrono::steady_clock::now() > deadline) {

@@ -2,7 +2,7 @@
 //
 // A PostgreSQL server of a test's own, on a socket in a temporary folder; gone when the test is, however it ends.
 //
-// Why so        A guardian process holds the server: it stops it and removes the folder once its pipe to the test
+// Why so        A watchdog process holds the server: it stops it and removes the folder once its pipe to the test
 //               closes, which a crash or a kill of the test does too.
 #pragma once
 
@@ -24,9 +24,9 @@ class TemporaryPostgres {
   private:
     std::filesystem::path folder_;
     struct Close {
-        void operator()(std::FILE* pipe) const { ::pclose(pipe); }  // returns when the guardian has done
+        void operator()(std::FILE* pipe) const { ::pclose(pipe); }  // returns when the watchdog has done
     };
-    std::unique_ptr<std::FILE, Close> guardian_;
+    std::unique_ptr<std::FILE, Close> watchdog_;
     int databases_ = 0;
 };
 

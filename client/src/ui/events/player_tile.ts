@@ -2,7 +2,8 @@
 //
 // One player on the stage: its picture with camera and time, and the reason where there is no picture.
 
-import type { Player, PlayerState } from "../../playback/player";
+import type { Player } from "../../playback/player";
+import type { PlayerState } from "../../playback/player_state";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { clockTime, shortDate } from "../widgets/text";

@@ -2,7 +2,7 @@
 //
 // The transport controls below the stage: play, step, rate, what is playing, download.
 
-import { kRates } from "../../playback/player";
+import { kRates } from "../../playback/player_state";
 import type { SyncPlayback } from "../../playback/sync_playback";
 import type { Recordings } from "../../wire/recordings";
 import { iconButton } from "../widgets/button";

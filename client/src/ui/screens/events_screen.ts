@@ -4,7 +4,7 @@
 
 import { kindOf } from "../../playback/coverage";
 import { FootageCache } from "../../playback/footage_cache";
-import { kRates } from "../../playback/player";
+import { kRates } from "../../playback/player_state";
 import { RecordedDays } from "../../playback/recorded_days";
 import { SyncPlayback } from "../../playback/sync_playback";
 import { isSameFootage, Recordings, type Footage } from "../../wire/recordings";

@@ -5,7 +5,7 @@
 // Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of the one
 //               before are left out, and each colour is filled once, so that dragging is smooth.
 
-import { kindOf, touching, type EventKind, type Segment } from "../../playback/coverage";
+import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
 import { midnights } from "../../playback/recorded_days";
 import type { Footage, FootageRef } from "../../wire/recordings";
 import type { TimeScale } from "./time_scale";
@@ -99,7 +99,7 @@ export function paintLane(
   if (lane.hasDay) return paintDays(context, scale, lane.hasDay, barTop, barPx);
   const strip = (segment: Segment) => [segment.startS, segment.stopS] as const;
   paintBars(context, scale, lane.segments.map(strip), barTop, barPx, kRecorded);
-  const shown = touching(lane.footage, scale.startMs / 1000, scale.endMs / 1000);
+  const shown = overlapping(lane.footage, scale.startMs / 1000, scale.endMs / 1000);
   const marks = shown.filter(({ kind }) => kind !== "event");
   const bars = (kind: EventKind) => shown.filter((one) => kindOf(one) === kind).map((one) => [one.start, one.stop] as const);
   paintBars(context, scale, bars("continuous"), barTop, barPx, kContinuous);

@@ -10,7 +10,7 @@
 #include <string>
 #include <string_view>
 
-namespace lookhaven::store {
+namespace lookhaven::remote {
 
 // How far the two hosts' clocks, and a token's age, may be apart.
 constexpr std::int64_t kPairTokenWindowSeconds = 300;
@@ -22,4 +22,4 @@ std::string MakePairToken(std::string_view secret, std::string_view timestamp);
 // False for anything malformed, an empty secret too. Takes the same time whatever byte of the token is wrong.
 bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s);
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::remote

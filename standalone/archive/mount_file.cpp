@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/archive/file.h"
+#include "standalone/archive/mount_file.h"
 
 #include <algorithm>
 #include <cctype>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/store/pair_token.h"
+#include "standalone/remote/pair_token.h"
 
 #include <array>
 #include <charconv>
@@ -9,9 +9,8 @@
 #include <sodium.h>
 
 #include "standalone/base/text.h"
-#include "standalone/store/text.h"
 
-namespace lookhaven::store {
+namespace lookhaven::remote {
 
 namespace {
 
@@ -33,7 +32,7 @@ bool IsWithinWindow(std::string_view timestamp, std::int64_t now_s) {
 }  // namespace
 
 std::string MakePairToken(std::string_view secret, std::string_view timestamp) {
-    if (!IsHex(secret, kSecretDigits)) {
+    if (!base::IsHex(secret, kSecretDigits)) {
         throw std::invalid_argument("the secret of two hosts is 64 hexadecimal digits");
     }
     std::array<unsigned char, crypto_auth_hmacsha256_KEYBYTES> key{};
@@ -46,10 +45,10 @@ std::string MakePairToken(std::string_view secret, std::string_view timestamp) {
 }
 
 bool PairTokenMatches(std::string_view token, std::string_view timestamp, std::string_view secret, std::int64_t now_s) {
-    if (token.size() != kTokenDigits || !IsHex(secret, kSecretDigits) || !IsWithinWindow(timestamp, now_s)) {
+    if (token.size() != kTokenDigits || !base::IsHex(secret, kSecretDigits) || !IsWithinWindow(timestamp, now_s)) {
         return false;
     }
     return sodium_memcmp(MakePairToken(secret, timestamp).data(), token.data(), kTokenDigits) == 0;
 }
 
-}  // namespace lookhaven::store
+}  // namespace lookhaven::remote

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/binding/large_pages.h"
+#include "standalone/binding/huge_pages.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -14,6 +14,6 @@ namespace lookhaven::cli {
 void RequireFreeFolder(store::Store& store, const std::string& path, int mount_id, bool take_over);
 
 // Marks the folder as that of the mount. Keeps later cameras and events from getting the numbers of footage that is there.
-void MarkFolder(store::Store& store, const store::Mount& mount);
+void ClaimFolder(store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::cli

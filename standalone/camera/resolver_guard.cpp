@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/camera/only_host.h"
+#include "standalone/camera/resolver_guard.h"
 
 #include <algorithm>
 
@@ -42,9 +42,12 @@ extern "C" __attribute__((visibility("default"))) int getaddrinfo(const char* na
                                                                   const addrinfo* hints, addrinfo** result) {
     using namespace lookhaven::camera;
     static const auto real = reinterpret_cast<decltype(&getaddrinfo)>(::dlsym(RTLD_NEXT, "getaddrinfo"));
-    if (name == nullptr || ::strcasecmp(name, permitted_host.c_str()) != 0 || look_ups_left-- <= 0) {
+    if (name == nullptr || ::strcasecmp(name, permitted_host.c_str()) != 0) {
         refused_host = name == nullptr ? "" : name;
         return EAI_FAIL;
+    }
+    if (look_ups_left-- <= 0) {
+        return EAI_AGAIN;
     }
     return real(name, service, hints, result);
 }

@@ -4,7 +4,7 @@
 //
 // Why so        The other host is trusted with what it was asked for and with nothing else: no header of its answer is
 //               passed on but the content type, and that only when it is one of those expected.
-#include "standalone/remote/library.h"
+#include "standalone/remote/transfer.h"
 
 #include <algorithm>
 #include <array>

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What a decoder tries, in a request process, once a camera's picture has taken it over.
-#include "standalone/api/picture_filter.h"
+#include "standalone/api/decoder_sandbox.h"
 
 #include <functional>
 #include <thread>
@@ -14,7 +14,6 @@
 
 #include <gtest/gtest.h>
 
-#include "standalone/base/system_call_filter.h"
 #include "test/support/folder.h"
 #include "test/support/process.h"
 
@@ -24,7 +23,7 @@ namespace {
 bool Works(const std::function<bool()>& attempt, const std::vector<sock_filter>& filter) {
     const int status = WaitFor(InChild([&] {
         if (!filter.empty()) {
-            base::Apply(filter);
+            api::EnterDecoderSandbox(filter);
         }
         ::_exit(attempt() ? 0 : 1);
     }));
@@ -50,11 +49,11 @@ bool Sends() {
     return ::sendmsg(connection[0], &message, MSG_DONTWAIT | MSG_NOSIGNAL) == 1;
 }
 
-TEST(PictureFilter, LeavesADecoderWhatItsProcessNeeds) {
+TEST(DecoderSandbox, LeavesADecoderWhatItsProcessNeeds) {
     const TemporaryFolder home;
     ASSERT_EQ(::socketpair(AF_UNIX, SOCK_STREAM, 0, connection), 0);
-    const std::vector<sock_filter> player = api::FilterOfPlayers();
-    const std::vector<sock_filter> still = api::FilterOfStills();
+    const std::vector<sock_filter> player = api::PlaybackFilter();
+    const std::vector<sock_filter> still = api::StillPictureFilter();
     const struct {
         const char* name;
         std::function<bool()> attempt;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/cli/mount_marker.h"
+#include "standalone/cli/mount_claim.h"
 
 #include <algorithm>
 #include <optional>
@@ -12,7 +12,7 @@
 namespace lookhaven::cli {
 
 void RequireFreeFolder(store::Store& store, const std::string& path, int mount_id, bool take_over) {
-    const std::optional<maintenance::MountMark> found = maintenance::MountFolder::ReadMarker(path);
+    const std::optional<maintenance::MountMarker> found = maintenance::MountFolder::ReadMarker(path);
     if (!found || take_over) {
         return;
     }
@@ -26,8 +26,8 @@ void RequireFreeFolder(store::Store& store, const std::string& path, int mount_i
                   ": with --take-over this mount gets it, and nothing else may record to it then");
 }
 
-void MarkFolder(store::Store& store, const store::Mount& mount) {
-    maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkOf(store, mount.id));
+void ClaimFolder(store::Store& store, const store::Mount& mount) {
+    maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkerFor(store, mount.id));
     const auto folder = maintenance::OpenMount(store, mount);
     int last_event = 0;
     for (const auto& file : folder ? folder->Files() : std::vector<maintenance::MountFolder::File>()) {

@@ -15,8 +15,11 @@
 namespace lookhaven::api {
 
 // Throws std::system_error.
-std::vector<sock_filter> FilterOfPlayers();
+std::vector<sock_filter> PlaybackFilter();
 // For the calling process alone.
-std::vector<sock_filter> FilterOfStills();
+std::vector<sock_filter> StillPictureFilter();
+
+// For good. Where the kernel has no filters it is logged, and the process keeps its calls. Throws std::system_error.
+void EnterDecoderSandbox(const std::vector<sock_filter>& filter);
 
 }  // namespace lookhaven::api

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps the recorder's role in the store for this process (store/recorder_lease.h).
+// Holds the recorder lease of the store for this process (store/recorder_lease.h).
 //
 // Thread safety One thread.
 #pragma once
@@ -14,30 +14,30 @@
 
 namespace lookhaven::recorder {
 
-class RecorderRole {
+class LeaseKeeper {
   public:
     static constexpr std::int64_t kRenewUs = 5'000'000;
     static constexpr std::int64_t kExpiryUs = 20'000'000;
 
-    // name: of this installation on this host. Nobody else with that name runs, so its role is taken over at once.
-    explicit RecorderRole(std::string name, std::function<std::int64_t()> monotonic_us)
+    // name: of this installation on this host. Nobody else with that name runs, so its lease is taken over at once.
+    explicit LeaseKeeper(std::string name, std::function<std::int64_t()> monotonic_us)
         : name_(std::move(name)),
           monotonic_us_(std::move(monotonic_us)) {}
 
-    // Renews or takes the role when that is due; whether this process has it. first_own_id as in RecorderLease. While the
-    // store is away the role stays. Throws store::StoreError.
-    bool Hold(store::Store& store, int first_own_id);
+    // Renews or takes the lease when that is due; whether this process has it. first_reserved_id as in RecorderLease. While the
+    // store is away the lease stays. Throws store::StoreError.
+    bool Hold(store::Store& store, int first_reserved_id);
 
   private:
-    bool MayTake(const store::RecorderRole& role, std::int64_t now_us);
+    bool MayTake(const store::LeaseState& state, std::int64_t now_us);
 
     const std::string name_;
     const std::function<std::int64_t()> monotonic_us_;
-    std::optional<std::int64_t> held_count_;  // nothing while the role is not ours
+    std::optional<std::int64_t> held_count_;  // nothing while the lease is not ours
     std::optional<std::int64_t> seen_count_;  // somebody else's
     std::int64_t changed_us_ = 0;             // when it was seen to change, or ours was renewed
     bool was_held_ = false;
-    int told_first_own_id_ = 0;
+    int told_first_reserved_id_ = 0;
 };
 
 }  // namespace lookhaven::recorder

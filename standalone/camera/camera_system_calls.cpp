@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/camera/system_call_filter.h"
+#include "standalone/camera/camera_system_calls.h"
 
 #include <utility>
 
@@ -21,7 +21,7 @@ namespace {
 using base::SystemCallFilter;
 
 void AllowHarmless(SystemCallFilter& filter) {
-    filter.Except(
+    filter.AddException(
         {// Sockets and descriptors.
          SCMP_SYS(close), SCMP_SYS(connect), SCMP_SYS(getpeername), SCMP_SYS(getsockname), SCMP_SYS(getsockopt),
          SCMP_SYS(poll), SCMP_SYS(ppoll), SCMP_SYS(ppoll_time64), SCMP_SYS(pselect6), SCMP_SYS(pselect6_time64),
@@ -42,8 +42,8 @@ void AllowHarmless(SystemCallFilter& filter) {
          SCMP_SYS(rt_sigprocmask), SCMP_SYS(rt_sigreturn), SCMP_SYS(sched_getaffinity), SCMP_SYS(sched_yield),
          SCMP_SYS(sigaltstack), SCMP_SYS(sigreturn), SCMP_SYS(sysinfo), SCMP_SYS(time), SCMP_SYS(uname)});
     if (kSanitized) {  // for its checks and reports
-        filter.Except({SCMP_SYS(pipe), SCMP_SYS(pipe2), SCMP_SYS(prctl), SCMP_SYS(prlimit64), SCMP_SYS(readlink),
-                       SCMP_SYS(readlinkat)});
+        filter.AddException({SCMP_SYS(pipe), SCMP_SYS(pipe2), SCMP_SYS(prctl), SCMP_SYS(prlimit64), SCMP_SYS(readlink),
+                             SCMP_SYS(readlinkat)});
     }
 }
 
@@ -55,32 +55,32 @@ void AllowSockets(SystemCallFilter& filter) {
                                              {SOCK_STREAM, IPPROTO_TCP},
                                              {SOCK_DGRAM, 0},
                                              {SOCK_DGRAM, IPPROTO_UDP}}) {
-            filter.Except({SCMP_SYS(socket)}, {{0, family}, {1, type, kSocketType}, {2, protocol}});
+            filter.AddException({SCMP_SYS(socket)}, {{0, family}, {1, type, kSocketType}, {2, protocol}});
         }
     }
     // What the C library sets where it asks a name server, and libav where it connects.
     for (const auto& [level, option] :
          {std::pair<int, int>(IPPROTO_IP, IP_RECVERR), {IPPROTO_IPV6, IPV6_RECVERR}, {IPPROTO_TCP, TCP_NODELAY}}) {
-        filter.Except({SCMP_SYS(setsockopt)}, {{1, level}, {2, option}});
+        filter.AddException({SCMP_SYS(setsockopt)}, {{1, level}, {2, option}});
     }
 }
 
 }  // namespace
 
 bool FilterSystemCalls() {
-    SystemCallFilter filter(SystemCallFilter::Others::kRefused);
+    SystemCallFilter filter(SystemCallFilter::DefaultAction::kRefuse);
     AllowHarmless(filter);
     AllowSockets(filter);
-    filter.Except({SCMP_SYS(openat)}, {{2, O_RDONLY, O_ACCMODE | O_CREAT | O_TRUNC}});
-    filter.Except({SCMP_SYS(mmap), SCMP_SYS(mmap2), SCMP_SYS(mprotect)}, {{2, 0, PROT_EXEC}});
+    filter.AddException({SCMP_SYS(openat)}, {{2, O_RDONLY, O_ACCMODE | O_CREAT | O_TRUNC}});
+    filter.AddException({SCMP_SYS(mmap), SCMP_SYS(mmap2), SCMP_SYS(mprotect)}, {{2, 0, PROT_EXEC}});
     for (const int command : {F_GETFD, F_SETFD, F_GETFL, F_SETFL}) {  // not F_SETOWN, which sends signals
-        filter.Except({SCMP_SYS(fcntl), SCMP_SYS(fcntl64)}, {{1, command}});
+        filter.AddException({SCMP_SYS(fcntl), SCMP_SYS(fcntl64)}, {{1, command}});
     }
     for (const int command : {FIONREAD, FIONBIO}) {
-        filter.Except({SCMP_SYS(ioctl)}, {{1, command}});
+        filter.AddException({SCMP_SYS(ioctl)}, {{1, command}});
     }
-    filter.Except({SCMP_SYS(tgkill)}, {{0, ::getpid()}});  // abort
-    return base::Apply(filter.Program());
+    filter.AddException({SCMP_SYS(tgkill)}, {{0, ::getpid()}});  // abort
+    return base::InstallSystemCallFilter(filter.Program());
 }
 
 }  // namespace lookhaven::camera

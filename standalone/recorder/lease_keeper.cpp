@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/lease_keeper.h"
+
+#include <utility>
+
+#include "standalone/base/log.h"
+
+namespace lookhaven::recorder {
+
+bool LeaseKeeper::Hold(store::Store& store, int first_reserved_id) {
+    const std::int64_t now_us = monotonic_us_();
+    if (held_count_ && now_us - changed_us_ < kRenewUs && first_reserved_id == told_first_reserved_id_) {
+        return true;
+    }
+    store::RecorderLease lease(store);
+    const store::LeaseState state = lease.Current();
+    if (MayTake(state, now_us) && lease.Take(state.count, name_, first_reserved_id)) {
+        if (!held_count_ && !state.holder.empty() && state.holder != name_) {
+            base::LogWarning("records in the place of " + state.holder + ", which has stopped");
+        }
+        held_count_ = state.count + 1;
+        changed_us_ = now_us;
+        told_first_reserved_id_ = first_reserved_id;
+        was_held_ = true;
+    } else if (std::exchange(held_count_, std::nullopt)) {
+        base::LogError("stops recording: " + state.holder + " records the cameras of this store now");
+    }
+    return held_count_.has_value();
+}
+
+bool LeaseKeeper::MayTake(const store::LeaseState& state, std::int64_t now_us) {
+    if (held_count_) {
+        // A store that lost its last second, as after a crash of its server, has an older count of ours.
+        return state.count == *held_count_ || (state.holder == name_ && state.count < *held_count_);
+    }
+    // Under our name it is an earlier process of ours, unless we have lost the lease to it.
+    if (state.holder.empty() || (state.holder == name_ && !was_held_)) {
+        return true;
+    }
+    if (seen_count_ != state.count) {
+        if (!std::exchange(seen_count_, state.count)) {
+            base::LogWarning("does not record: " + state.holder + " records the cameras of this store");
+        }
+        changed_us_ = now_us;
+    }
+    return now_us - changed_us_ >= kExpiryUs;
+}
+
+}  // namespace lookhaven::recorder

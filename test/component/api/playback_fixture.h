@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// A host whose players the tests steer and watch.
+#pragma once
+
+#include <array>
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <optional>
+#include <string>
+
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/time.h>
+
+#include "test/support/host/host_under_test.h"
+
+namespace lookhaven::api {
+
+using host::Answer;
+using host::Eventually;
+using host::HostUnderTest;
+
+// A player's stream, read by the test.
+class Player {
+  public:
+    Player(const HostUnderTest& host, const std::string& cookie, const std::string& query)
+        : connection_(host.OpenQuery("api=VEXO.Lookhaven.Player&version=1&method=" + query, cookie)) {}
+
+    // The number behind name in the newest part; waits for a part that came after this call. Nothing when it has ended.
+    std::optional<int> Tell(const std::string& name) {
+        Read();
+        text_.clear();
+        const auto until = std::chrono::steady_clock::now() + std::chrono::seconds(5);
+        for (std::string wanted = name + "="; !ended_ && std::chrono::steady_clock::now() < until; Read()) {
+            const std::size_t end = text_.rfind(';');
+            const std::size_t begin = end == text_.npos ? end : text_.rfind("rate=", end);
+            const std::size_t at = begin == text_.npos ? begin : text_.find(wanted, begin);
+            if (at != text_.npos && at < end) {
+                return std::stoi(text_.substr(at + wanted.size()));
+            }
+        }
+        return std::nullopt;
+    }
+    bool HasEnded() {
+        Read();
+        return ended_;
+    }
+    void Close() { connection_.Reset(); }
+
+  private:
+    void Read() {
+        std::array<char, 65536> block{};
+        const timeval limit{0, 20'000};
+        setsockopt(connection_.Get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
+        const ssize_t got = recv(connection_.Get(), block.data(), block.size(), 0);
+        if (got > 0) {
+            text_.append(block.data(), static_cast<std::size_t>(got));
+        } else {
+            ended_ = got == 0 || (errno != EAGAIN && errno != EINTR);
+        }
+    }
+
+    base::FileDescriptor connection_;
+    std::string text_;
+    bool ended_ = false;
+};
+
+class Playback : public testing::Test {
+  protected:
+    // Its players tidy up behind themselves.
+    ~Playback() override { host_.End(SIGTERM); }
+
+    Player Play(const std::string& query) {
+        Player player(host_, session_.secret, query);
+        EXPECT_TRUE(player.Tell("rate")) << query;
+        return player;
+    }
+    Answer Ask(const std::string& method, const std::string& form, const std::string& cookie = "") const {
+        return host_.Ask("api=VEXO.Playback&version=1&method=" + method, cookie.empty() ? session_.secret : cookie, {},
+                         form);
+    }
+    std::filesystem::path PlayerFile() const { return "/tmp/player_src.pid." + session_.handle; }
+    std::size_t ProgressFiles() const {
+        std::error_code error;
+        return static_cast<std::size_t>(
+            std::distance(std::filesystem::directory_iterator(host_.Home().ProgressFolder(), error), {}));
+    }
+
+    HostUnderTest host_;
+    store::NewSession session_ = host_.LogIn();
+};
+
+}  // namespace lookhaven::api

@@ -1,0 +1,136 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The processes that the web API host starts: when they end, and that nothing of a request stays behind.
+#include <array>
+#include <chrono>
+#include <csignal>
+#include <random>
+
+#include <sys/socket.h>
+#include <sys/wait.h>
+
+#include "standalone/base/process.h"
+#include "standalone/host/listener.h"
+#include "standalone/store/users.h"
+#include "test/component/host/running_host.h"
+#include "test/support/host/scgi_bytes.h"
+
+namespace lookhaven::host {
+namespace {
+
+using namespace std::chrono_literals;
+
+TEST(Host, EndsProcessesWhoseClientLeft) {
+    const HostUnderTest host({"--leave-seconds", "0.5"});
+    const std::string admin = host.LogIn().secret;
+    for (const char* method : {"Stream", "Hang", "DeafStream"}) {
+        base::FileDescriptor connection = host.Open(method, admin);
+        ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 1; })) << method;
+        if (std::string(method) != "Hang") {
+            ASSERT_TRUE(HasPicture(connection)) << method;
+        }
+        connection.Reset();
+        EXPECT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; })) << method;
+    }
+}
+
+TEST_F(RunningHost, RepeatsSigtermUntilAHandlerListens) {
+    ASSERT_TRUE(HasPicture(host_.Open("LateStream", admin_)));
+    EXPECT_TRUE(Eventually(8s, [&] { return host_.RequestProcesses() == 0; })) << "well before it is killed";
+}
+
+TEST_F(RunningHost, EndsStreamsOfEndedSessions) {
+    store::Store records = store::Store::Open(host_.Home().StoreUrl());
+    const base::FileDescriptor other = OpenStream(host_, admin_);
+    const struct {
+        const char* name;
+        std::function<void(const store::NewSession&)> end;
+    } cases[] = {
+        {"log-out",
+         [&](const store::NewSession& session) {
+             EXPECT_EQ(host_.Ask("api=VEXO.Auth&version=1&method=Logout", session.secret, {}, "a=1").status, 200);
+         }},
+        {"ended in the store", [&](const store::NewSession& session) { store::Sessions(records).End(session.handle); }},
+        {"new password", [&](const store::NewSession&) { store::Users(records).SetPassword(2, "a new password"); }},
+        {"denial", [&](const store::NewSession&) { store::Users(records).Deny(2, 1); }}};
+    for (const auto& each : cases) {
+        const store::NewSession session = host_.LogIn("guest");
+        const base::FileDescriptor stream = OpenStream(host_, session.secret);
+        each.end(session);
+        EXPECT_TRUE(Eventually(2s, [&] { return IsOver(stream); })) << each.name;
+        EXPECT_EQ(host_.Ask("api=Test&version=1&method=Success", session.secret).status, 401) << each.name;
+    }
+    EXPECT_FALSE(IsOver(other)) << "another's stream goes on";
+}
+
+TEST_F(RunningHost, LeavesNothingAfterCutConnections) {
+    const std::string request = ScgiBytes({{"REQUEST_METHOD", "GET"},
+                                           {"QUERY_STRING", "api=Test&version=1&method=Stream"},
+                                           {"HTTP_COOKIE", "id=" + admin_}});
+    ASSERT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 200);
+    ASSERT_TRUE(Eventually(2s, [&] { return host_.RequestProcesses() == 0; }));
+    const std::size_t descriptors = host_.Descriptors();
+    std::mt19937 random(7);
+    for (int i = 0; i < 200; ++i) {
+        const base::FileDescriptor connection = host_.Connect();
+        const std::size_t length = random() % 2 == 0 ? request.size() : random() % request.size();
+        send(connection.Get(), request.data(), length, MSG_NOSIGNAL);
+        std::array<char, 64> block{};
+        if (length == request.size() && random() % 2 == 0) {
+            recv(connection.Get(), block.data(), block.size(), 0);
+        }
+    }
+    EXPECT_TRUE(Eventually(5s, [&] { return host_.RequestProcesses() == 0; }));
+    EXPECT_TRUE(Eventually(2s, [&] { return host_.Descriptors() == descriptors; }))
+        << host_.Descriptors() << " instead of " << descriptors;
+}
+
+TEST(Host, TakesItsProcessesAlong) {
+    for (const int signal : {SIGKILL, SIGTERM}) {
+        HostUnderTest host;
+        const base::FileDescriptor stream = OpenStream(host, host.LogIn().secret);
+        const std::vector<pid_t> children = host.Children();
+        ASSERT_EQ(children.size(), 2U) << "the stream and the watcher";
+        const std::filesystem::path socket = host.Home().WebApiSocket();
+        const int status = host.End(signal);
+        EXPECT_TRUE(Eventually(2s, [&] { return IsOver(stream); }));
+        for (const pid_t child : children) {
+            EXPECT_TRUE(Eventually(2s, [&] { return base::ProcessStartTicks(child) == 0; }));
+        }
+        if (signal == SIGTERM) {
+            EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
+            EXPECT_FALSE(std::filesystem::exists(socket));
+        }
+    }
+}
+
+TEST(Host, LeavesItsSuccessorsSocketAlone) {
+    const test::TemporaryFolder folder;
+    const std::filesystem::path path = folder / "socket";
+    Listener old(path);
+    for (int i = 0; i < 50; ++i) {  // a file system may give the next file the number of one that is gone
+        old.Close();
+        EXPECT_FALSE(std::filesystem::exists(path));
+        const Listener successor(path);
+        old.Close();
+        EXPECT_TRUE(std::filesystem::exists(path)) << i;
+    }
+}
+
+TEST_F(RunningHost, StartsItsWatcherAnew) {
+    ASSERT_TRUE(Eventually(2s, [&] { return host_.Children().size() == 1; }));
+    const pid_t watcher = host_.Children().front();
+    kill(watcher, SIGKILL);
+    EXPECT_TRUE(Eventually(5s, [&] { return host_.Children().size() == 1 && host_.Children().front() != watcher; }));
+}
+
+TEST(Host, ServesASocketHandedOver) {
+    HostUnderTest host({}, true);
+    EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
+    const std::filesystem::path socket = host.Home().WebApiSocket();
+    host.End(SIGTERM);
+    EXPECT_TRUE(std::filesystem::exists(socket)) << "whoever opened it removes it";
+}
+
+}  // namespace
+}  // namespace lookhaven::host

@@ -1,0 +1,37 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Two recorders on one store.
+#include "standalone/recorder/lease_keeper.h"
+
+#include <gtest/gtest.h>
+
+#include "standalone/base/installation.h"
+#include "standalone/store/store.h"
+#include "test/support/footage/archive_folder.h"
+
+namespace lookhaven::recorder {
+namespace {
+
+TEST(LeaseKeeper, OneRecorderAtATimeHoldsAStore) {
+    const test::ArchiveFolder home;
+    base::Installation::CreateFolders(home.Path());
+    store::Store::Migrate(base::Installation(home.Path()).StoreUrl());
+    store::Store store = store::Store::Open(base::Installation(home.Path()).StoreUrl());
+    std::int64_t now_us = 0;
+    LeaseKeeper first("A", [&] { return now_us; });
+    LeaseKeeper second("B", [&] { return now_us; });
+    for (; now_us < 10 * LeaseKeeper::kExpiryUs; now_us += LeaseKeeper::kRenewUs) {
+        EXPECT_TRUE(first.Hold(store, 1));
+        EXPECT_FALSE(second.Hold(store, 1));
+    }
+    EXPECT_TRUE(LeaseKeeper("A", [&] { return now_us; }).Hold(store, 7)) << "started again";
+    EXPECT_EQ(store::RecorderLease(store).Current().first_reserved_id, 7);
+    now_us += LeaseKeeper::kRenewUs;
+    EXPECT_FALSE(first.Hold(store, 1));
+    EXPECT_FALSE(second.Hold(store, 1));
+    now_us += LeaseKeeper::kExpiryUs;
+    EXPECT_TRUE(second.Hold(store, 1)) << "nobody renews it";
+}
+
+}  // namespace
+}  // namespace lookhaven::recorder
