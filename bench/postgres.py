@@ -8,6 +8,7 @@ import shutil
 import signal
 import subprocess
 import tempfile
+import time
 
 from stand import wait_until
 
@@ -19,6 +20,7 @@ class Postgres:
 
     def __enter__(self):
         self._folder = pathlib.Path(tempfile.mkdtemp(prefix="lookhaven-bench-postgres-"))
+        self._folder.chmod(0o711)  # others than its own user connect, too
         self._user = {}
         if os.geteuid() == 0:
             entry = pwd.getpwnam("postgres")
@@ -26,12 +28,23 @@ class Postgres:
             self._user = {"user": entry.pw_uid, "group": entry.pw_gid, "extra_groups": []}
         data = self._folder / "data"
         self._run("initdb", "-D", data, "-A", "trust", "-U", "postgres", "-N", "-E", "UTF8", "--locale=C")
+        self._start()
+        return self
+
+    def _start(self):
+        data = self._folder / "data"
         self._server = subprocess.Popen(
             [PROGRAMS / "postgres", "-D", data, "-k", self._folder, "-c", "listen_addresses="],
             cwd=self._folder, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, **self._user,
         )
         wait_until(lambda: "ready" in self._state(data / "postmaster.pid"), 60, "PostgreSQL is ready")
-        return self
+
+    def crash(self, seconds):
+        """Ends without a shutdown, and is back after that many seconds."""
+        self._server.send_signal(signal.SIGQUIT)
+        self._server.wait(timeout=60)
+        time.sleep(seconds)
+        self._start()
 
     def __exit__(self, *_):
         self._server.send_signal(signal.SIGINT)  # its fast shutdown

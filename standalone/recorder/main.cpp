@@ -17,6 +17,7 @@
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/instance_lock.h"
 #include "standalone/recorder/supervisor.h"
+#include "standalone/ring/inventory.h"
 
 namespace {
 
@@ -44,7 +45,9 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
     while (g_stop == 0) {
         supervisor.Step();
     }
-    if (!supervisor.Finish(kFinishLimit)) {
+    const bool has_finished = supervisor.Finish(kFinishLimit);
+    ring::RetireAll(installation);  // also of earlier recorders, that were killed
+    if (!has_finished) {
         base::LogWarning("stopped while the store or a disk was still blocked");
         ::_exit(EX_OK);
     }

@@ -49,6 +49,13 @@ uid_t UserOf(const base::Installation& installation) {
     return is_root && ::stat(installation.Home().c_str(), &status) == 0 ? status.st_uid : ::geteuid();
 }
 
+void Retire(const Attachment& attachment) {
+    SegmentHead& head = View(attachment.Address()).Head();
+    head.retired.store(1);
+    base::Wake(head.wake);
+    attachment.RemoveSegment();
+}
+
 // Becomes the dead writer's successor, so that no new writer adopts the ring meanwhile, and removes it.
 bool RemoveDeadWriters(const Attachment& attachment) {
     SegmentHead& head = View(attachment.Address()).Head();
@@ -56,9 +63,7 @@ bool RemoveDeadWriters(const Attachment& attachment) {
     if (IsWordAlive(writer) || !head.writer.compare_exchange_strong(writer, OwnWord())) {
         return false;
     }
-    head.retired.store(1);
-    base::Wake(head.wake);
-    attachment.RemoveSegment();
+    Retire(attachment);
     return true;
 }
 
@@ -105,6 +110,19 @@ std::size_t RemoveOrphans(const base::Installation& installation) {
         removed += IsRingKey(status.shm_perm.__key) && RemoveIfAbandoned(installation.Id(), shm_id) ? 1 : 0;
     });
     return removed;
+}
+
+void RetireAll(const base::Installation& installation) {
+    const auto retire = [](const Attachment& attachment, SegmentCheck check, const shmid_ds&) {
+        if (check != SegmentCheck::kGood) {
+            return;
+        }
+        const std::uint64_t writer = View(attachment.Address()).Head().writer.load();
+        if (writer == OwnWord() || !IsWordAlive(writer)) {
+            Retire(attachment);
+        }
+    };
+    ForEachSegment(installation.Id(), ::geteuid(), retire);
 }
 
 }  // namespace lookhaven::ring

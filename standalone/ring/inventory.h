@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Lists an installation's segments and removes those that dead processes left.
+// Lists an installation's segments and removes those that nobody writes any more.
 #pragma once
 
 #include <cstddef>
@@ -32,5 +32,8 @@ std::vector<SegmentState> ListSegments(const base::Installation& installation);
 // Removes the segments that a dead writer left and that nobody has attached; those with viewers stay, to be adopted.
 // Call it when the recorder starts and now and then. Returns how many were removed.
 std::size_t RemoveOrphans(const base::Installation& installation);
+
+// For a recorder that stops: the segments of its writers, and of dead ones, go with their last reader, who ends.
+void RetireAll(const base::Installation& installation);
 
 }  // namespace lookhaven::ring

@@ -275,6 +275,11 @@ TEST_F(LifecycleTest, OnlyOrphansAreRemoved) {
     EXPECT_EQ(left[0].id, other);
     EXPECT_TRUE(left[0].writer_alive);
     EXPECT_EQ(left[0].attached, 1U);
+    ring = Attach(installation_, other);
+    RetireAll(installation_);
+    EXPECT_TRUE(IsRetired(ring)) << "its viewer ends";
+    EXPECT_TRUE(ListSegments(installation_).empty());
+    Detach(ring);
 }
 
 }  // namespace

@@ -1,0 +1,273 @@
+# SPDX-License-Identifier: Apache-2.0
+"""Breaks a running installation again and again, at random, and looks each time for what that has cost: footage, a viewer's
+connection, processes, descriptors, shared memory, files. Prints what was done and lost; ends with 1 at the first break of a
+promise, and keeps the state folder then."""
+
+import argparse
+import collections
+import contextlib
+import datetime
+import json
+import os
+import pathlib
+import random
+import signal
+import socket
+import sqlite3
+import subprocess
+import sys
+import threading
+import time
+
+ROOT = pathlib.Path(__file__).resolve().parents[2]
+sys.path[:0] = [str(ROOT / "test/system"), str(ROOT / "bench")]
+from installation import LIVE, PASSWORDS, Installation, children, descendants, program, wait_until  # noqa: E402
+from postgres import Postgres  # noqa: E402
+
+MAX_LOST_S = 1.0  # of footage, by a killed recorder
+RESTART_S = 20  # within which viewers are promised new pictures
+
+
+class Watcher:
+    """A viewer who comes back whenever its stream ends."""
+
+    def __init__(self, server, camera):
+        self.connections = self.pictures = 0
+        self._server, self._camera, self._stop = server, camera, threading.Event()
+        self._thread = threading.Thread(target=self._watch)
+        self._thread.start()
+
+    def _watch(self):
+        while not self._stop.is_set():
+            with contextlib.suppress(OSError, EOFError, ValueError, AssertionError):
+                with self._server.live(self._camera) as stream:
+                    self.connections += 1
+                    while not self._stop.is_set():
+                        stream.next()
+                        self.pictures += 1
+            self._stop.wait(0.1)
+
+    def sees_more(self):
+        """Waits for ten more pictures."""
+        wanted = self.pictures + 10
+        wait_until(lambda: self.pictures >= wanted, RESTART_S + 10, "a viewer gets pictures again")
+
+    def close(self):
+        self._stop.set()
+        self._thread.join()
+
+
+def last_frame_s(recording):
+    """Unix time of the file's last frame; None for a file without one."""
+    words = "ffprobe -v quiet -of json -select_streams v -show_entries format_tags=creation_time:packet=pts_time".split()
+    told = json.loads(subprocess.run([*words, recording], capture_output=True, check=False).stdout or "{}")
+    packets = told.get("packets")
+    if not packets:
+        return None
+    start = datetime.datetime.fromisoformat(told["format"]["tags"]["creation_time"].replace("Z", "+00:00"))
+    return start.timestamp() + float(packets[-1]["pts_time"])
+
+
+class Torture:
+    def __init__(self, server, postgres):
+        self.server, self.postgres = server, postgres
+        self.counts, self.lost, self.recorders = collections.Counter(), [], {server.part("recorder")}
+        self._decoded = set()
+        self.camera = self._add_camera("Tortured", server.cli("mount", "list", "--json"))
+        self.disk = pathlib.Path(f"{server._folder.name}/disk")
+        self.disk.mkdir(mode=0o777)
+        if os.geteuid() == 0:
+            self._mount_disk()
+            self.cli("mount", "add", "--name", "Small disk", str(self.disk))
+            self._add_camera("On the small disk", server.cli("mount", "list", "--json"))
+        self.watcher = Watcher(server, self.camera)
+        self.watcher.sees_more()
+
+    def cli(self, *arguments):
+        return self.server.cli(*arguments)
+
+    def _add_camera(self, name, mounts):
+        """Records on the newest mount."""
+        mount = str(max(each["id"] for each in json.loads(mounts)))
+        camera = self.cli("camera", "add", "--enable", "--name", name, "--source", "test:mjpeg", "--record", "always",
+                          "--segment", "10s", "--mount", mount, "--json")
+        return json.loads(camera)["id"]
+
+    def _mount_disk(self):
+        owner = self.server.home.stat()
+        options = f"size=48m,uid={owner.st_uid},gid={owner.st_gid}"
+        subprocess.run(["mount", "-t", "tmpfs", "-o", options, "tmpfs", self.disk], check=True)
+
+    def recordings(self):
+        return sorted(self.server.home.glob(f"recordings/{self.camera}/*/*.mkv"), key=lambda path: path.stat().st_mtime)
+
+    # --- what is done
+
+    def kill_recorder(self):
+        connections = self.watcher.connections
+        newest = self.recordings()[-1:]
+        killed_s = time.time()
+        os.kill(self.server.part("recorder"), signal.SIGKILL)
+        last_s = last_frame_s(newest[0]) if newest else None
+        if last_s is not None:
+            self.lost.append(killed_s - last_s)
+            assert self.lost[-1] <= MAX_LOST_S, f"{self.lost[-1]:.2f} s lost at the end of {newest[0]}"
+        self.watcher.sees_more()
+        assert self.watcher.connections == connections, "a viewer had to come back after the recorder was killed"
+        self.recorders.add(self.server.part("recorder"))
+        wait_until(lambda: self.camera in self.server.recording_cameras(), RESTART_S, "it records again")
+
+    def kill_host(self):
+        os.kill(self.server.part("webapi"), signal.SIGKILL)
+
+    def kill_web_server(self):
+        os.kill(self.server.part("nginx"), signal.SIGKILL)
+
+    def kill_request(self):
+        requests = [pid for pid in self.server.requests() if program(pid)]
+        if requests:
+            with contextlib.suppress(ProcessLookupError):
+                os.kill(random.choice(requests), signal.SIGKILL)
+
+    def cut_clients(self):
+        cookie = self.server.session("admin")
+        query = f"/webapi?api={LIVE}&version=1&method=Play&camera={self.camera}"
+        head = f"GET {query} HTTP/1.1\r\nHost: 127.0.0.1:{self.server.port}\r\nCookie: id={cookie}\r\n\r\n".encode()
+        for _ in range(100):
+            with contextlib.suppress(OSError), socket.create_connection(("127.0.0.1", self.server.port)) as client:
+                client.sendall(head[: random.randint(0, len(head))] if random.random() < 0.5 else head)
+                client.settimeout(0.02)
+                client.recv(random.randint(1, 100_000))
+
+    def lose_store(self):
+        seconds = random.uniform(0.1, 3)
+        if self.postgres is not None:
+            self.postgres.crash(seconds)
+        else:
+            with contextlib.closing(sqlite3.connect(self.server.home / "lookhaven.db", timeout=20)) as database:
+                database.execute("begin exclusive")
+                time.sleep(seconds)
+
+    def hang_recorder(self):
+        recorder = self.server.part("recorder")
+        os.kill(recorder, signal.SIGSTOP)
+        time.sleep(random.uniform(0.1, 4))
+        os.kill(recorder, signal.SIGCONT)
+
+    def fill_disk(self):
+        with contextlib.suppress(OSError), open(self.disk / "filler", "wb") as filler:
+            while True:
+                filler.write(bytes(1 << 20))
+        time.sleep(random.uniform(0.5, 3))
+        (self.disk / "filler").unlink()
+
+    def remount_disk_read_only(self):
+        subprocess.run(["mount", "-o", "remount,ro", self.disk], capture_output=True, check=False)  # refused while it writes
+        time.sleep(random.uniform(0.5, 3))
+        subprocess.run(["mount", "-o", "remount,rw", self.disk], check=True)
+
+    def unplug_disk(self):
+        """Away, with all that is on it, and another one in its place."""
+        subprocess.run(["mount", "--move", self.disk, self._drawer()], check=True)
+        time.sleep(random.uniform(0.5, 3))
+        subprocess.run(["mount", "--move", self._drawer(), self.disk], check=True)
+
+    def _drawer(self):
+        drawer = self.disk.with_name("drawer")
+        drawer.mkdir(exist_ok=True)
+        return drawer
+
+    # --- what must hold
+
+    def check(self):
+        self.watcher.sees_more()
+        wait_until(lambda: self.camera in self.server.recording_cameras(), RESTART_S, "it records")
+        wait_until(self._is_clean, 60, "store and recordings agree")
+        for recording in self.recordings()[:-1]:
+            if recording not in self._decoded:
+                decoder = ["ffmpeg", "-v", "error", "-xerror", "-i", recording, "-f", "null", "-"]
+                done = subprocess.run(decoder, capture_output=True, text=True, check=False)
+                assert done.returncode == 0 and not done.stderr, f"{recording}: {done.stderr}"
+                self._decoded.add(recording)
+
+    def _is_clean(self):
+        with contextlib.suppress(AssertionError):
+            self.cli("verify")
+            return True
+        return False
+
+    def descriptors(self):
+        parts = [pid for pid in children(self.server.server.pid) if program(pid).startswith("lookhaven-")]
+        return {program(pid): len(os.listdir(f"/proc/{pid}/fd")) for pid in parts}
+
+    def close(self):
+        self.watcher.close()
+        for folder in (self.disk, self._drawer()):
+            if os.path.ismount(folder):
+                subprocess.run(["umount", "--lazy", folder], check=True)
+
+
+def run(torture, seconds):
+    actions = [torture.kill_recorder] * 12 + [torture.kill_host, torture.kill_web_server, torture.hang_recorder, torture.lose_store]
+    actions += [torture.kill_request, torture.cut_clients] * 2
+    if os.geteuid() == 0:
+        actions += [torture.fill_disk, torture.remount_disk_read_only, torture.unplug_disk]
+    before = torture.descriptors()
+    deadline = time.monotonic() + seconds
+    while time.monotonic() < deadline:
+        for action in random.sample(actions, len(actions)):
+            if time.monotonic() > deadline:
+                break
+            action()
+            torture.counts[action.__name__] += 1
+            torture.watcher.sees_more()
+        torture.check()
+    after = torture.descriptors()
+    for name, count in before.items():
+        assert after.get(name, 0) <= count + 8, f"{name} had {count} descriptors, and has {after.get(name)}"
+
+
+def segments_of(creators):
+    """Shared memory that one of these processes made."""
+    rows = [line.split() for line in pathlib.Path("/proc/sysvipc/shm").read_text().splitlines()[1:]]
+    return [row[1] for row in rows if int(row[4]) in creators]
+
+
+def main():
+    options = argparse.ArgumentParser(description=__doc__)
+    options.add_argument("--seconds", type=float, default=600)
+    options.add_argument("--seed", type=int, default=int(time.time()))
+    options.add_argument("--postgresql", action="store_true", help="keep the records there instead of in SQLite")
+    chosen = options.parse_args()
+    random.seed(chosen.seed)
+    print(f"seed {chosen.seed}", flush=True)
+    with contextlib.ExitStack() as stack:
+        postgres = stack.enter_context(Postgres()) if chosen.postgresql else None
+        store = postgres.new_database("torture") if postgres else None
+        server = Installation()
+        if store is not None:
+            server.home.mkdir()
+            (server.home / "store").write_text(store + "\n")
+            server.cli("init", "--admin", "admin", text=PASSWORDS["admin"] + "\n")
+        server.start()
+        torture = None
+        try:
+            torture = Torture(server, postgres)
+            run(torture, chosen.seconds)
+        except BaseException:
+            print(f"torture: state folder kept: {server.home}", file=sys.stderr)
+            raise
+        finally:
+            if torture is not None:
+                print(json.dumps({"done": torture.counts, "files decoded": len(torture._decoded),
+                                  "lost a kill, mean s": round(sum(torture.lost) / max(1, len(torture.lost)), 3),
+                                  "lost a kill, max s": round(max(torture.lost, default=0), 3)}), flush=True)
+                torture.close()
+            server.stop()
+        server.discard()
+    assert not segments_of(torture.recorders), "shared memory is left"
+    assert not list(pathlib.Path("/tmp").glob("player_src.pid.*")), "player files are left"
+
+
+if __name__ == "__main__":
+    main()
