@@ -1,7 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
-"""Live viewers of H.264: what 4 Mbit/s cost, and how old the picture is that Chromium shows. Prints two Markdown tables.
+"""Live viewers of H.264: what 4 Mbit/s cost, and how old the picture is that Chromium shows. Prints three Markdown tables.
 
-The second table is about the whole product as script/server starts it: the test pattern of camera 2 is drawn, encoded,
+The last table is about the whole product as script/server starts it: the test pattern of camera 2 is drawn, encoded,
 recorded into its ring, served through nginx over HTTP/2 and TLS, decoded by WebCodecs and drawn to the canvas of the large
 view. The delay is from the time that the pattern shows (the light along its lower edge, read back from the canvas) to the
 animation frame after the drawing.
@@ -11,7 +11,7 @@ import pathlib
 import sys
 
 from stand import ROOT, Installation
-from viewing import Load, print_comparison
+from viewing import Load, print_tables
 from visit import Visit
 
 WATCH_SECONDS = 20
@@ -35,7 +35,7 @@ def print_canvas_delays(build_folder):
 
 def main():
     bin_folder = pathlib.Path(sys.argv[1])
-    print_comparison(bin_folder, Load("H264", 20_000, 25, viewers=(1, 10, 50)))
+    print_tables(bin_folder, Load("H264", 20_000, 25, viewers=(1, 10, 50)))
     print()
     if (ROOT / "client/dist/index.html").exists() and (ROOT / "test/node_modules").exists():
         print_canvas_delays(bin_folder.parent)

@@ -10,7 +10,7 @@ import subprocess
 import sys
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
-from installation import PASSWORDS, ROOT, Installation, descendants, wait_until
+from installation import PASSWORDS, ROOT, Installation, descendants, free_port, wait_until
 
 
 def cpu_nanos(pids):
@@ -24,18 +24,25 @@ def private_kib(pid):
     return sum(int(line.split()[1]) for line in rollup if line.startswith(("Private_Clean", "Private_Dirty")))
 
 
-def viewers(bin_folder, count, seconds, target):
+def answers(port):
+    with socket.socket() as probe:
+        return probe.connect_ex(("127.0.0.1", port)) == 0
+
+
+def viewers(bin_folder, count, seconds, target, program="bench_viewers"):
     """Starts viewers; call the result for what they saw."""
     run = subprocess.Popen(
-        [bin_folder / "bench_viewers", "--viewers", str(count), "--seconds", str(seconds), *target],
-        stdout=subprocess.PIPE,
+        [bin_folder / program, "--viewers", str(count), "--seconds", str(seconds), *target], stdout=subprocess.PIPE
     )
 
     def result():
         output, _ = run.communicate()
         if run.returncode != 0:
             raise RuntimeError("the viewers failed")
-        return json.loads(output)
+        seen = json.loads(output)
+        if seen["ended"]:
+            raise RuntimeError(f"{seen['ended']} of {count} streams ended")
+        return seen
 
     return result
 
@@ -77,6 +84,10 @@ class Stand(Installation):
     def add_test_camera(self, name, source, video_type="mjpeg"):
         self.cli("camera", "add", "--name", name, "--type", video_type, "--source", source)
 
+    def add_recorded_camera(self, name, source, video_type):
+        self.cli("camera", "add", "--enable", "--name", name, "--type", video_type, "--source", source,
+                 "--audio" if video_type == "h264" else "--no-audio", "--record", "always", "--segment", "60m")
+
     def take_in_recordings(self):
         """Gives the recordings that lie on the mount rows and indexes; the event of each camera."""
         self.cli("verify", "--repair")
@@ -84,6 +95,15 @@ class Stand(Installation):
 
     def add_events(self, count, days):
         self.cli("demo", "events", "--count", str(count), "--days", str(days), timeout=None)
+
+    def end(self, name):
+        """Ends one process of those that were started, and what is below it."""
+        process = self._processes.pop(name)
+        process.terminate()
+        process.wait(timeout=20)
+
+    def start_recorder(self):
+        self._start("recorder", self._bin / "lookhaven-recorder", "--home", self.home)
 
     def start_feeder(self, camera, codec, frame_bytes, frames_per_second):
         self._start(
@@ -104,35 +124,40 @@ class Stand(Installation):
              "-subj", "/CN=bench", "-keyout", self.home / "tls/key.pem", "-out", self.home / "tls/certificate.pem"],
             check=True, capture_output=True,
         )
+        self._start_nginx("nginx", self.home / "run", self.socket, self.port, self.tls_port)
+
+    def start_relay(self, origin):
+        """A second web server, the same in everything, for an origin that speaks SCGI on that socket. Its TLS port."""
+        port, tls_port = free_port(), free_port()
+        folder = self.home / "run/relay"
+        folder.mkdir(exist_ok=True)
+        self._start_nginx("relay", folder, origin, port, tls_port)
+        return tls_port
+
+    def _start_nginx(self, name, folder, origin, port, tls_port):
         configuration = (ROOT / "packaging/nginx/lookhaven.conf.in").read_text()
         for word, value in {
-            "user": "user root root;" if os.geteuid() == 0 else "",
-            "home": self.home,
-            "client": self.home,
-            "port": self.port,
-            "tls_port": self.tls_port,
-            "listen_v6": "",
-            "strict_transport_security": "",
+            "@home@/run/webapi.sock": origin,
+            "@home@/run": folder,
+            "@user@": "user root root;" if os.geteuid() == 0 else "",
+            "@home@": self.home,
+            "@client@": self.home,
+            "@port@": port,
+            "@tls_port@": tls_port,
+            "@listen_v6@": "",
+            "@strict_transport_security@": "",
         }.items():
-            configuration = configuration.replace(f"@{word}@", str(value))
-        path = self.home / "run/nginx.conf"
+            configuration = configuration.replace(word, str(value))
+        path = folder / "nginx.conf"
         path.write_text(configuration)
-        self._start("nginx", "/usr/sbin/nginx", "-p", self.home / "run", "-c", path)
-        wait_until(self._answers, 10, "nginx answers")
-
-    def _answers(self):
-        with socket.socket() as probe:
-            return probe.connect_ex(("127.0.0.1", self.port)) == 0
+        self._start(name, "/usr/sbin/nginx", "-p", folder, "-c", path)
+        wait_until(lambda: answers(port), 10, "nginx answers")
 
     def log_in(self):
         """The session cookie's value; needs the web server."""
         return self.session("admin")
 
-    def host_processes(self):
-        """The host and its request processes, oldest first."""
-        host = self._processes["webapi"].pid
-        return [host, *sorted(descendants(host))]
-
-    def nginx_processes(self):
-        nginx = self._processes["nginx"].pid
-        return [nginx, *sorted(descendants(nginx))]
+    def processes(self, name):
+        """The process that was started under that name and all below it, oldest first."""
+        pid = self._processes[name].pid
+        return [pid, *sorted(descendants(pid))]
