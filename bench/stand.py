@@ -145,6 +145,7 @@ class Stand(Installation):
             "@port@": port,
             "@tls_port@": tls_port,
             "@listen_v6@": "",
+            "@prefer_chacha20@": "off",
             "@strict_transport_security@": "",
         }.items():
             configuration = configuration.replace(word, str(value))
