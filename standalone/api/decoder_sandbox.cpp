@@ -1,41 +1,50 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/decoder_sandbox.h"
 
+#include <cerrno>
+
+#include <fcntl.h>
+#include <linux/landlock.h>
 #include <sched.h>
+#include <sys/ioctl.h>
 #include <sys/mman.h>
+#include <sys/prctl.h>
 #include <sys/socket.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
+#include "standalone/base/file.h"
+#include "standalone/base/file_descriptor.h"
 #include "standalone/base/log.h"
 #include "standalone/base/system_call_filter.h"
 
 namespace lookhaven::api {
 
+using base::ArgumentIsNot;
 using base::SystemCallFilter;
 
-// Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not named.
-std::vector<sock_filter> PlaybackFilter() {
-    SystemCallFilter filter(SystemCallFilter::DefaultAction::kAllow);
-    // Programs and processes. Threads are made by clone, since a filter cannot read what clone3 is told.
-    filter.AddException({SCMP_SYS(execve), SCMP_SYS(execveat), SCMP_SYS(fork), SCMP_SYS(vfork), SCMP_SYS(clone3)});
-    filter.AddException({SCMP_SYS(clone)}, {{0, 0, CLONE_THREAD}});
-    filter.AddException({SCMP_SYS(ptrace), SCMP_SYS(process_vm_readv), SCMP_SYS(process_vm_writev),
-                         SCMP_SYS(pidfd_getfd), SCMP_SYS(pidfd_send_signal), SCMP_SYS(kill), SCMP_SYS(tkill),
-                         SCMP_SYS(rt_sigqueueinfo), SCMP_SYS(rt_tgsigqueueinfo)});
-    // Parts of the kernel in which faults are found, and which nothing here uses.
-    filter.AddException({SCMP_SYS(unshare), SCMP_SYS(setns), SCMP_SYS(bpf), SCMP_SYS(perf_event_open),
-                         SCMP_SYS(userfaultfd), SCMP_SYS(io_uring_setup), SCMP_SYS(io_uring_enter),
-                         SCMP_SYS(io_uring_register), SCMP_SYS(keyctl), SCMP_SYS(add_key), SCMP_SYS(request_key),
-                         SCMP_SYS(personality), SCMP_SYS(modify_ldt), SCMP_SYS(vmsplice)});
-    // It serves nobody, and speaks to a database's server alone: AF_UNIX, AF_INET, AF_INET6.
-    filter.AddException({SCMP_SYS(bind), SCMP_SYS(listen), SCMP_SYS(accept), SCMP_SYS(accept4)});
-    for (const int family : {0, 3, 4, 5, 6, 7, 8, 9, 11, 12, 13, 14, 15}) {
-        filter.AddException({SCMP_SYS(socket)}, {{0, family}});
+namespace {
+
+// Whatever the rules say of files, a process under Landlock reaches no process outside: neither its memory nor its
+// descriptors, not even as root. A kernel without it leaves that to Yama.
+void CloseOtherProcesses() {
+    landlock_ruleset_attr attributes{};
+    attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE;
+    const base::FileDescriptor rules(
+        static_cast<int>(::syscall(SYS_landlock_create_ruleset, &attributes, sizeof attributes, 0)));
+    if (!rules && (errno == ENOSYS || errno == EOPNOTSUPP)) {
+        return;
     }
-    for (const int bit : {16, 32}) {  // the higher ones
-        filter.AddException({SCMP_SYS(socket)}, {{0, bit, bit}});
+    if (!rules || ::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
+        ::syscall(SYS_landlock_restrict_self, rules.Get(), 0) != 0) {
+        base::ThrowErrno("cannot keep a player from other processes");
     }
-    return filter.Program();
+}
+
+void Install(const std::vector<sock_filter>& filter) {
+    if (!base::InstallSystemCallFilter(filter)) {
+        base::LogWarning("a camera's pictures are decoded with all system calls: this kernel has no filters for them");
+    }
 }
 
 std::vector<sock_filter> StillPictureFilter() {
@@ -54,14 +63,58 @@ std::vector<sock_filter> StillPictureFilter() {
                          SCMP_SYS(sched_yield), SCMP_SYS(sigreturn)});
     // AddressSanitizer asks for it before each function that never returns.
     filter.AddException({SCMP_SYS(sigaltstack)});
-    filter.AddException({SCMP_SYS(tgkill)}, {{0, ::getpid()}});  // where its client is gone
+    filter.AddException({SCMP_SYS(tgkill)}, {{0, base::kOwnProcess}});  // where its client is gone
     return filter.Program();
 }
 
-void EnterDecoderSandbox(const std::vector<sock_filter>& filter) {
-    if (!base::InstallSystemCallFilter(filter)) {
-        base::LogWarning("a camera's pictures are decoded with all system calls: this kernel has no filters for them");
+}  // namespace
+
+// Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not named.
+std::vector<sock_filter> PlaybackFilter() {
+    SystemCallFilter filter(SystemCallFilter::DefaultAction::kAllow);
+    // Programs and processes. Threads are made by clone, since a filter cannot read what clone3 is told.
+    filter.AddException({SCMP_SYS(execve), SCMP_SYS(execveat), SCMP_SYS(fork), SCMP_SYS(vfork), SCMP_SYS(clone3)});
+    filter.AddException({SCMP_SYS(clone)}, {{0, 0, CLONE_THREAD}});
+    filter.AddException({SCMP_SYS(ptrace), SCMP_SYS(process_vm_readv), SCMP_SYS(process_vm_writev),
+                         SCMP_SYS(pidfd_open), SCMP_SYS(pidfd_getfd), SCMP_SYS(pidfd_send_signal), SCMP_SYS(kill),
+                         SCMP_SYS(tkill), SCMP_SYS(rt_sigqueueinfo), SCMP_SYS(rt_tgsigqueueinfo)});
+    filter.AddException({SCMP_SYS(tgkill)}, {ArgumentIsNot(0, base::kOwnProcess)});  // itself where its client is gone
+    filter.AddException({SCMP_SYS(prlimit64)}, {ArgumentIsNot(0, 0)});
+    filter.AddException({SCMP_SYS(setpriority), SCMP_SYS(ioprio_set), SCMP_SYS(sched_setaffinity),
+                         SCMP_SYS(sched_setattr), SCMP_SYS(sched_setparam), SCMP_SYS(sched_setscheduler)});
+    // Signals for what happens on a descriptor, and input for the terminal that the host may have been started from.
+    for (const int command : {F_SETOWN, F_SETSIG, F_SETOWN_EX}) {
+        filter.AddException({SCMP_SYS(fcntl), SCMP_SYS(fcntl64)}, {{1, command}});
     }
+    for (const int command : {FIOSETOWN, SIOCSPGRP, TIOCSTI, TIOCLINUX}) {
+        filter.AddException({SCMP_SYS(ioctl)}, {{1, command}});
+    }
+    // The rings of live views.
+    filter.AddException({SCMP_SYS(shmget), SCMP_SYS(shmat), SCMP_SYS(shmctl)});
+    // Parts of the kernel in which faults are found, and which nothing here uses.
+    filter.AddException({SCMP_SYS(unshare), SCMP_SYS(setns), SCMP_SYS(bpf), SCMP_SYS(perf_event_open),
+                         SCMP_SYS(userfaultfd), SCMP_SYS(io_uring_setup), SCMP_SYS(io_uring_enter),
+                         SCMP_SYS(io_uring_register), SCMP_SYS(keyctl), SCMP_SYS(add_key), SCMP_SYS(request_key),
+                         SCMP_SYS(personality), SCMP_SYS(modify_ldt), SCMP_SYS(vmsplice)});
+    // It serves nobody, and speaks to a database's server alone: AF_UNIX, AF_INET, AF_INET6.
+    filter.AddException({SCMP_SYS(bind), SCMP_SYS(listen), SCMP_SYS(accept), SCMP_SYS(accept4)});
+    for (const int family : {0, 3, 4, 5, 6, 7, 8, 9, 11, 12, 13, 14, 15}) {
+        filter.AddException({SCMP_SYS(socket)}, {{0, family}});
+    }
+    for (const int bit : {16, 32}) {  // the higher ones
+        filter.AddException({SCMP_SYS(socket)}, {{0, bit, bit}});
+    }
+    return filter.Program();
+}
+
+void EnterPlaybackSandbox(const std::vector<sock_filter>& playback_filter) {
+    CloseOtherProcesses();
+    Install(playback_filter);
+}
+
+void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own) {
+    slots.KeepOnly(own);
+    Install(StillPictureFilter());
 }
 
 }  // namespace lookhaven::api

@@ -5,19 +5,24 @@
 // Why so        A decoder may have faults that a camera makes use of. The process that plays a recording goes on to open
 //               recordings, the store and its files in /tmp, so it keeps what these need: files and local sockets. It
 //               loses other programs and processes, and the rarely used parts of the kernel. A still picture needs nothing
-//               more once the frame is there, so its process loses nearly all.
+//               more once the frame is there, so its process loses nearly all. Of the table of requests both keep their
+//               own slot (SlotTable::KeepOnly), a player once the host knows it.
 #pragma once
 
 #include <vector>
 
 #include <linux/filter.h>
 
+#include "standalone/control/slot_table.h"
+
 namespace lookhaven::api {
 
-// Throws std::system_error.
+// What EnterPlaybackSandbox needs, made once for all players. Throws std::system_error.
 std::vector<sock_filter> PlaybackFilter();
-// For the calling process alone.
-std::vector<sock_filter> StillPictureFilter();
+// Each confines the calling process, which has one thread, for good. Where the kernel has no filters it is logged, and the
+// process keeps its calls. Throws std::system_error.
+void EnterPlaybackSandbox(const std::vector<sock_filter>& playback_filter);
+void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own);
 
 // For good. Where the kernel has no filters it is logged, and the process keeps its calls. Throws std::system_error.
 void EnterDecoderSandbox(const std::vector<sock_filter>& filter);

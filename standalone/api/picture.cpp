@@ -58,7 +58,7 @@ std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
     try {
         const media::DecoderLibrary& decoder = media::LoadDecoderLibrary();
         call.context.CloseRecords();
-        EnterDecoderSandbox(StillPictureFilter());
+        EnterStillPictureSandbox(call.slots, call.slot);
         return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());

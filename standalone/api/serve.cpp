@@ -161,7 +161,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
         PreparePlayer(call);
     }
     if (IsPlayer(call)) {
-        EnterDecoderSandbox(service.playback_filter);
+        EnterPlaybackSandbox(service.playback_filter);
     }
     return RunModule(entry, call);
 }
@@ -198,7 +198,10 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
         slot.is_stream = true;
         LimitAddressSpace(RLIM_INFINITY);
     };
-    events.on_player = [&slots, &slot](std::int64_t key) { slots.BeginPlayer(slot, key); };
+    events.on_player = [&slots, &slot](std::int64_t key) {
+        slots.BeginPlayer(slot, key);
+        slots.KeepOnly(slot);  // now it opens its recording
+    };
     events.on_paired_host = [&service, &slots, &slot](const std::string& secret) {
         slot.pairing = store::PairingId(secret);
         AdmitPairedHost(slots, slot, service.limits);

@@ -39,9 +39,11 @@ SystemCallFilter::SystemCallFilter(DefaultAction action)
 
 void SystemCallFilter::AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions) {
     std::vector<scmp_arg_cmp> compared;
-    for (const auto& [argument, value, mask] : conditions) {
-        compared.push_back(
-            {argument, SCMP_CMP_MASKED_EQ, static_cast<std::uint32_t>(mask), static_cast<std::uint32_t>(value)});
+    for (const auto& [argument, value, mask, negated] : conditions) {
+        const auto wanted = static_cast<std::uint32_t>(value);
+        compared.push_back(negated
+                               ? scmp_arg_cmp{argument, SCMP_CMP_NE, wanted, 0}
+                               : scmp_arg_cmp{argument, SCMP_CMP_MASKED_EQ, static_cast<std::uint32_t>(mask), wanted});
     }
     for (const int call : calls) {
         Check(::seccomp_rule_add_array(filter_.get(), exception_, call, static_cast<unsigned>(compared.size()),
@@ -64,12 +66,17 @@ std::vector<sock_filter> SystemCallFilter::Program() const {
     return program;
 }
 
-bool InstallSystemCallFilter(const std::vector<sock_filter>& program) {
+bool InstallSystemCallFilter(std::vector<sock_filter> program) {
     // A kernel that has filters looks for one at address 0.
     if (::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, nullptr, 0, 0) != 0 && errno != EFAULT) {
         return false;
     }
-    const sock_fprog code{static_cast<unsigned short>(program.size()), const_cast<sock_filter*>(program.data())};
+    for (sock_filter& instruction : program) {
+        if (instruction.code == (BPF_JMP | BPF_JEQ | BPF_K) && instruction.k == kOwnProcess) {
+            instruction.k = static_cast<std::uint32_t>(::getpid());
+        }
+    }
+    const sock_fprog code{static_cast<unsigned short>(program.size()), program.data()};
     if (::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
         ::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &code, 0, 0) != 0) {
         ThrowErrno("cannot filter system calls");

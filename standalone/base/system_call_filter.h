@@ -15,12 +15,19 @@
 
 namespace lookhaven::base {
 
-// The lower 32 bits of an argument, masked, have that value.
+// The lower 32 bits of an argument, masked, have that value; or, negated, the whole argument has another one.
 struct ArgumentIs {
     unsigned argument;
     int value;
     int mask = ~0;
+    bool negated = false;
 };
+constexpr ArgumentIs ArgumentIsNot(unsigned argument, int value) {
+    return {argument, value, ~0, true};
+}
+
+// As a value: the id of the process that installs it, whoever made the filter. No process has this one.
+constexpr int kOwnProcess = 0x7fffff1d;
 
 class SystemCallFilter {
   public:
@@ -42,6 +49,6 @@ class SystemCallFilter {
 
 // Filters the calls of this thread and of what it starts, for good; takes about 50 µs. False when this kernel, or what
 // emulates it, has no filters. Throws std::system_error.
-[[nodiscard]] bool InstallSystemCallFilter(const std::vector<sock_filter>& program);
+[[nodiscard]] bool InstallSystemCallFilter(std::vector<sock_filter> program);
 
 }  // namespace lookhaven::base

@@ -16,6 +16,7 @@ namespace lookhaven::control {
 // The slots behind it are aligned as well.
 struct alignas(Slot) SlotTable::Guard {
     pthread_mutex_t mutex;
+    std::atomic<std::size_t> used;  // slots, from the first on
 };
 
 namespace {
@@ -38,20 +39,33 @@ SlotTable::SlotTable(std::size_t slots) : wake_(::eventfd(0, EFD_NONBLOCK | EFD_
     guard_ = new (memory) Guard{};
     InitSharedMutex(guard_->mutex);
     slots_ = {reinterpret_cast<Slot*>(guard_ + 1), slots};
-    for (Slot& slot : slots_) {
-        new (&slot) Slot{};
-    }
+    is_taken_.resize(slots);
 }
 
 SlotTable::~SlotTable() {
-    ::munmap(guard_, sizeof(Guard) + slots_.size_bytes());
+    if (guard_ != nullptr) {
+        ::munmap(guard_, SizeBytes());
+    }
+}
+
+std::size_t SlotTable::SizeBytes() const {
+    return sizeof(Guard) + slots_.size_bytes();
+}
+
+std::span<Slot> SlotTable::Used() const {
+    return slots_.first(guard_->used);
 }
 
 Slot* SlotTable::Take(std::size_t keep_free) {
-    const auto is_free = [](const Slot& each) { return each.serial == 0; };
-    const auto slot = std::find_if(slots_.begin(), slots_.end(), is_free);
-    if (std::count_if(slot, slots_.end(), is_free) <= static_cast<std::ptrdiff_t>(keep_free)) {
+    if (std::ranges::count(is_taken_, false) <= static_cast<std::ptrdiff_t>(keep_free)) {
         return nullptr;
+    }
+    const auto index = static_cast<std::size_t>(std::ranges::find(is_taken_, false) - is_taken_.begin());
+    is_taken_[index] = true;
+    Slot* slot = &slots_[index];
+    if (index == guard_->used) {
+        new (slot) Slot{};
+        guard_->used = index + 1;
     }
     slot->is_stream = false;
     slot->has_session = false;
@@ -65,7 +79,29 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->player.paused = false;
     slot->player.pause = PackPause(++last_serial_, {});
     slot->serial = last_serial_;
-    return &*slot;
+    return slot;
+}
+
+void SlotTable::Free(Slot& slot) {
+    slot.serial = 0;
+    is_taken_[static_cast<std::size_t>(&slot - slots_.data())] = false;
+}
+
+void SlotTable::KeepOnly(const Slot& slot) {
+    if (guard_ == nullptr) {
+        return;
+    }
+    auto* const begin = reinterpret_cast<char*>(guard_);
+    const auto page_bytes = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+    const auto at = static_cast<std::size_t>(reinterpret_cast<const char*>(&slot) - begin) / page_bytes * page_bytes;
+    const std::size_t behind = at + std::max(page_bytes, sizeof slot);
+    ::munmap(begin, at);
+    if (behind < SizeBytes()) {
+        ::munmap(begin + behind, SizeBytes() - behind);
+    }
+    guard_ = nullptr;
+    slots_ = {};
+    wake_.Reset();
 }
 
 void SlotTable::SetSession(Slot& slot, std::string_view handle) {
@@ -78,9 +114,8 @@ void SlotTable::SetSession(Slot& slot, std::string_view handle) {
 }
 
 std::size_t SlotTable::CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const {
-    return static_cast<std::size_t>(std::count_if(slots_.begin(), slots_.end(), [&](const Slot& each) {
-        return &each != &slot && each.serial != 0 && counts(each);
-    }));
+    return static_cast<std::size_t>(std::ranges::count_if(
+        Used(), [&](const Slot& each) { return &each != &slot && each.serial != 0 && counts(each); }));
 }
 
 Admission SlotTable::Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
@@ -118,7 +153,7 @@ bool SlotTable::BeginHashing(Slot& slot, std::size_t max_in_all) {
 
 std::set<std::string> SlotTable::Sessions() const {
     std::set<std::string> sessions;
-    for (const Slot& slot : slots_) {
+    for (const Slot& slot : Used()) {
         if (slot.serial != 0 && slot.has_session && !slot.MustEnd()) {
             sessions.emplace(SessionOf(slot));
         }
@@ -128,7 +163,7 @@ std::set<std::string> SlotTable::Sessions() const {
 
 std::set<std::uint64_t> SlotTable::Pairings() const {
     std::set<std::uint64_t> pairings;
-    for (const Slot& slot : slots_) {
+    for (const Slot& slot : Used()) {
         if (const std::uint64_t pairing = slot.pairing; pairing != 0 && slot.serial != 0 && !slot.MustEnd()) {
             pairings.insert(pairing);
         }
@@ -138,7 +173,7 @@ std::set<std::uint64_t> SlotTable::Pairings() const {
 
 // The serial is read before the rest: of a slot that is taken anew in between, the old one is marked.
 void SlotTable::EndAll(const std::function<bool(const Slot&)>& is_meant) {
-    for (Slot& slot : slots_) {
+    for (Slot& slot : Used()) {
         const RequestRef use{&slot, slot.serial};
         if (use.serial != 0 && is_meant(slot)) {
             MarkEnded(use);
@@ -175,7 +210,7 @@ void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
 
 std::optional<RequestRef> SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
     std::optional<RequestRef> found;
-    for (Slot& slot : slots_) {
+    for (Slot& slot : Used()) {
         const RequestRef use{&slot, slot.serial};
         if (IsPlayerOf(slot, session) && slot.player.key == key && (!found || use.serial > found->serial)) {
             found = use;
@@ -211,7 +246,7 @@ bool SlotTable::ChangePause(const RequestRef& player, const std::function<void(P
 
 std::set<std::string> SlotTable::SessionsWithPlayers() const {
     std::set<std::string> sessions;
-    for (const Slot& slot : slots_) {
+    for (const Slot& slot : Used()) {
         if (slot.serial != 0 && slot.player.started_us != 0) {
             sessions.emplace(SessionOf(slot));
         }
@@ -222,7 +257,7 @@ std::set<std::string> SlotTable::SessionsWithPlayers() const {
 std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newest) const {
     std::vector<Slot*> others;
     const Slot* owner = nullptr;
-    for (Slot& slot : slots_) {
+    for (Slot& slot : Used()) {
         if (slot.serial != 0 && slot.pid == newest && SessionOf(slot) == session) {
             owner = &slot;
         } else if (IsPlayerOf(slot, session) && slot.player.started_us != 0) {
@@ -257,7 +292,8 @@ void SlotTable::SetWakeDescriptor(int descriptor) {
 }
 
 std::string_view SessionOf(const Slot& slot) {
-    return slot.has_session ? std::string_view(slot.session.data()) : std::string_view{};
+    const auto end = std::ranges::find(slot.session, '\0');  // a process that was taken over may have left none
+    return slot.has_session ? std::string_view(slot.session.begin(), end) : std::string_view{};
 }
 
 }  // namespace lookhaven::control

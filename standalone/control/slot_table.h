@@ -12,6 +12,8 @@
 //                   never reaches a later one in the same slot.
 //               (5) What a request occupies is noted in its slot alone, so it is given back when the process ends,
 //                   however it ends.
+//               (6) Each slot has pages of its own, so that a process can give up all others (KeepOnly). Which slots are
+//                   taken the host keeps in memory of its own.
 // Thread safety Any process. The host never waits for the mutex.
 #pragma once
 
@@ -62,7 +64,9 @@ enum class Work : std::uint8_t {
 
 enum class Admission { kGranted, kTooManyOfUser, kTooMany };
 
-struct Slot {
+constexpr std::size_t kSlotBytes = 4096;  // where pages are larger, a few slots share one
+
+struct alignas(kSlotBytes) Slot {
     std::atomic<std::uint64_t> serial;  // grows with each request; 0: free
     std::atomic<std::uint64_t> ended;   // serial of the last request here that must end, since its session, player or
                                         // client is gone
@@ -96,7 +100,7 @@ class SlotTable {
 
     // For the host: a slot for a new request, null when no more than that many are free.
     Slot* Take(std::size_t keep_free = 0);
-    static void Free(Slot& slot) { slot.serial = 0; }
+    void Free(Slot& slot);
 
     // For a request process: sets the session of its slot. Throws std::length_error for a handle that is too long.
     static void SetSession(Slot& slot, std::string_view handle);
@@ -142,6 +146,10 @@ class SlotTable {
     // The same without waking the host, for the host.
     static void MarkEnded(const RequestRef& use);
 
+    // For a request process that is about to decode: no other slot can be reached from it any more, nor the host be woken.
+    // Only what takes a slot alone may be called then.
+    void KeepOnly(const Slot& slot);
+
     // Readable after Wake, until ClearWake.
     int WakeDescriptor() const { return wake_.Get(); }
     void ClearWake();
@@ -158,8 +166,13 @@ class SlotTable {
     // How many other requests there are that count.
     std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;
 
+    // Those that have been taken: what is looked at costs each process a page.
+    std::span<Slot> Used() const;
+    std::size_t SizeBytes() const;
+
     Guard* guard_;  // makes counting and occupying one step; in memory before the slots
     std::span<Slot> slots_;
+    std::vector<bool> is_taken_;  // of the slots; the host's own
     std::uint64_t last_serial_ = 0;
     base::FileDescriptor wake_;
 };

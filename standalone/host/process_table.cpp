@@ -105,7 +105,7 @@ void ProcessTable::Reap(pid_t pid) {
                        std::to_string(WTERMSIG(status)));
     }
     Sweep(pid, *found->second.slot);
-    control::SlotTable::Free(*found->second.slot);
+    slots_.Free(*found->second.slot);
     processes_.erase(found);
 }
 
@@ -130,7 +130,8 @@ Clock::time_point ProcessTable::SignalExcess(Clock::time_point now) {
         }
         const std::chrono::microseconds started(newest->second.slot->player.started_us);
         for (const control::Slot* slot : slots_.ExcessPlayers(session, newest->first)) {
-            const auto found = processes_.find(slot->pid);
+            // Not by the id in the slot, which is the process's to write.
+            const auto found = std::ranges::find(processes_, slot, [](const auto& each) { return each.second.slot; });
             if (const auto due = Clock::time_point(started) + kSeek; now < due) {
                 next = std::min(next, due);
             } else if (found != processes_.end()) {

@@ -35,7 +35,7 @@ struct ProcessLimits {
 class ProcessTable {
   public:
     // Borrows the slots; progress_folder: where players keep their progress files.
-    ProcessTable(ProcessLimits limits, const control::SlotTable& slots, std::filesystem::path progress_folder)
+    ProcessTable(ProcessLimits limits, control::SlotTable& slots, std::filesystem::path progress_folder)
         : limits_(limits),
           slots_(slots),
           progress_folder_(std::move(progress_folder)) {}
@@ -81,7 +81,7 @@ class ProcessTable {
     bool SignalPauses();
 
     ProcessLimits limits_;
-    const control::SlotTable& slots_;
+    control::SlotTable& slots_;
     std::filesystem::path progress_folder_;
     Clock::time_point players_due_ = Clock::time_point::max();
     std::map<pid_t, Process> processes_;

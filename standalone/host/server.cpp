@@ -193,7 +193,7 @@ void Server::StartRequest(Connection connection) {
         work_.serve_request(request, slots_, *slot);
     });
     if (!process) {
-        control::SlotTable::Free(*slot);
+        slots_.Free(*slot);
         return Refuse(connections_[number] = std::move(connection), 503, "cannot start a request process");
     }
     Watch(process->pidfd, Kind::kProcess, static_cast<std::uint32_t>(process->pid), EPOLLIN);

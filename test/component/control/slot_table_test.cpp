@@ -53,7 +53,7 @@ TEST(SlotTable, IsNotOvershotByABurst) {
     const auto other = std::ranges::find(slots, Work::kNone, [](const Slot* slot) { return slot->work.load(); });
     EXPECT_FALSE(hash(**other)) << "the host has not reaped those that ended";
     for (Slot* slot : slots) {
-        SlotTable::Free(*slot);
+        table.Free(*slot);
     }
     Slot* next = table.Take();
     EXPECT_TRUE(hash(*next));
@@ -88,13 +88,13 @@ TEST(SlotTable, RequestsForAPlayerDoNotReachItsSuccessor) {
     const auto pause = [](Pause& asked) { asked = {true, -8}; };
     EXPECT_TRUE(SlotTable::ChangePause(first, pause));
     EXPECT_EQ(SlotTable::PauseOf(*first.slot).resumed_rate, -8);
-    SlotTable::Free(*first.slot);
+    table.Free(*first.slot);
     const RequestRef second = play();
     ASSERT_EQ(second.slot, first.slot);
     table.End(second);
     table.End(first);
     EXPECT_TRUE(second.slot->MustEnd()) << "a late mark takes no newer one away";
-    SlotTable::Free(*second.slot);
+    table.Free(*second.slot);
     const RequestRef third = play();
     table.End(first);
     EXPECT_FALSE(SlotTable::ChangePause(first, pause));
