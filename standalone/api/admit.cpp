@@ -81,7 +81,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
         throw Failure(403, "another site's page may not ask for this");
     }
     const auto cookie = call.cookies.find(SessionCookie(call.request));
-    if (cookie == call.cookies.end() || cookie->second.empty()) {
+    if (cookie == call.cookies.end() || !store::Sessions::MayBeSecret(cookie->second)) {
         return std::nullopt;
     }
     const std::int64_t now_s = base::WallSeconds();

@@ -2,6 +2,7 @@
 #include "standalone/host/server.h"
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
 #include <csignal>
 
@@ -38,6 +39,19 @@ int MillisUntil(Clock::time_point due) {
 bool LooksLikeLogIn(const http::Request& request) {
     return request.Header("REQUEST_METHOD") == "POST" &&
            request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
+}
+
+// A session's secret is 64 hexadecimal digits; whether there is such a session only a request process can ask.
+bool MayHaveSession(const http::Request& request) {
+    constexpr int kSecretDigits = 64;
+    int digits = 0;
+    for (const char each : request.Header("HTTP_COOKIE")) {
+        digits = std::isxdigit(static_cast<unsigned char>(each)) != 0 ? digits + 1 : 0;
+        if (digits == kSecretDigits) {
+            return true;
+        }
+    }
+    return false;
 }
 
 base::FileDescriptor BlockSignals() {
@@ -180,7 +194,7 @@ void Server::Refuse(Connection& connection, int status, const std::string& messa
 void Server::StartRequest(Connection connection) {
     const int number = connection.socket.Get();
     http::Request request = connection.parser.TakeRequest();
-    if (request.unread_body_bytes > 0 && request.Header("HTTP_COOKIE").empty()) {
+    if (request.unread_body_bytes > 0 && !MayHaveSession(request)) {
         return Refuse(connections_[number] = std::move(connection), LooksLikeLogIn(request) ? 413 : 401,
                       "log in first: without a session a body holds 4 KiB at most");
     }

@@ -35,10 +35,13 @@ std::string WithTimeouts(std::string location) {
 }
 
 // A Store is used by one thread, so connections need no locks of their own: they would be taken for each column of each
-// row. Before the first connection; SQLite refuses it later, which costs nothing but the time.
-void UseSqliteWithoutMutexes() {
+// row. Most are opened for a few rows, so they reserve no memory: each of fifty pages would cost more than a row. Before
+// the first connection; SQLite refuses it later, which costs nothing but the time.
+void ConfigureSqlite() {
     static const int done = [] {
         sqlite_api::sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
+        sqlite_api::sqlite3_config(SQLITE_CONFIG_LOOKASIDE, 0, 0);
+        sqlite_api::sqlite3_config(SQLITE_CONFIG_PAGECACHE, nullptr, 0, 0);
         return sqlite_api::sqlite3_config(SQLITE_CONFIG_MULTITHREAD);
     }();
     static_cast<void>(done);
@@ -66,7 +69,7 @@ StoreAddress StoreAddress::Parse(const std::string& url) {
 Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
     try {
         if (engine_ == Engine::kSqlite) {
-            UseSqliteWithoutMutexes();
+            ConfigureSqlite();
             session_.open(soci::sqlite3, "db=\"" + address.location + "\" timeout=" + kBusyTimeoutS);
             session_ << "pragma foreign_keys = on";
         } else {

@@ -61,8 +61,12 @@ NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::
     return session;
 }
 
+bool Sessions::MayBeSecret(std::string_view text) {
+    return base::IsHex(text, 2 * kSecretBytes);
+}
+
 std::optional<Session> Sessions::FindBySecret(std::string_view secret, std::int64_t now_s) {
-    if (!base::IsHex(secret, 2 * kSecretBytes)) {
+    if (!MayBeSecret(secret)) {
         return std::nullopt;
     }
     return connection_.FetchOne<Session>("where secret_hash = :hash and expires > :now", Digest(secret), now_s);

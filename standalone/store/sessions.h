@@ -52,6 +52,8 @@ class Sessions {
     // could not end a session that did not exist yet.
     NewSession Create(const VerifiedUser& user, std::int64_t now_s);
 
+    // False for what cannot be a session's secret, without asking the store.
+    static bool MayBeSecret(std::string_view text);
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
 
