@@ -58,11 +58,16 @@ void RequireMark(const Mark& mark) {
     }
 }
 
-// The command line reports as much as it likes.
+// Older ones that still wait count too: those of a mount that is away would grow without end. The command line reports
+// as much as it likes.
 void RequireWithin(soci::session& sql, std::int64_t max_per_day, const Reporter& reporter, std::int64_t now_s) {
+    const std::int64_t since_s = now_s - kSecondsPerDay;
     const auto reported = FetchOne<std::int64_t>(
-        sql, "select count(*) from marks where reporter_id = :user and reporter_id <> 0 and reported_s > :since",
-        reporter.user_id, now_s - kSecondsPerDay);
+        sql,
+        "select (select count(*) from marks where reporter_id = :user and reporter_id <> 0 and reported_s > :since)"
+        " + (select count(*) from marks where state = 0 and reporter_id = :waiting and reporter_id <> 0"
+        " and reported_s <= :before)",
+        reporter.user_id, since_s, reporter.user_id, since_s);
     if (reported.value() >= max_per_day) {
         throw TooManyMarks();
     }

@@ -73,7 +73,9 @@ struct MarkFilter {
 
 class TooManyMarks : public std::runtime_error {
   public:
-    TooManyMarks() : std::runtime_error("this account has reported as many events as it may within 24 hours") {}
+    TooManyMarks()
+        : std::runtime_error("this account has reported as many events as it may within 24 hours, or as may wait for "
+                             "their footage") {}
 };
 
 class Marks {
@@ -84,7 +86,7 @@ class Marks {
     // Stores a pending mark and returns it with its id and with the span that the camera's recording plan asks for.
     // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
     // characters but line ends. now_s: when it was reported. max_per_day: as many as that, of those that there are, may
-    // an account have reported within 24 hours, however many report at once. Throws InvalidRecord, NotFound for an
+    // an account have reported within 24 hours, or earlier and still pending, however many report at once. Throws InvalidRecord, NotFound for an
     // unknown camera, TooManyMarks.
     Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
              const Reporter& reporter = {}, std::int64_t now_s = 0,

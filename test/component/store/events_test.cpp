@@ -232,6 +232,8 @@ TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
     for (int of = 0; of < 2; ++of) {
         EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {}, kDay, 1)) << "nobody's";
     }
+    EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1), TooManyMarks) << "waits";
+    EXPECT_TRUE(marks_.Miss(told.id));
     EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1)) << "a day later";
     std::atomic<int> added = 0;
     InParallel(6, [&](Store& store) {
