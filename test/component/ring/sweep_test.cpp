@@ -68,6 +68,21 @@ TEST_F(SweepTest, OnlyUnfinishedSegmentsOfOursAreRemoved) {
     }
 }
 
+// Earlier versions computed other keys.
+TEST_F(SweepTest, ARingUnderAnyRingKeyGoesWithItsWriter) {
+    constexpr key_t kEarlierKey = 0x4c654321;
+    KilledChild writer([&] {
+        const Attachment ring = CreateSegment(installation_.Id(), kId, kMjpeg, kSmall);
+        void* earlier = ::shmat(::shmget(kEarlierKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | 0600), nullptr, 0);
+        std::memcpy(earlier, ring.Address(), SegmentBytes(kSmall));
+        ring.RemoveSegment();
+    });
+    EXPECT_EQ(RemoveOrphans(installation_), 0U) << "it is written to";
+    writer.Kill();
+    EXPECT_EQ(RemoveOrphans(installation_), 1U);
+    EXPECT_LT(::shmget(kEarlierKey, 0, 0), 0);
+}
+
 TEST_F(SweepTest, AProcessKilledBeforeItAttachesLeavesNothingForGood) {
     for (const bool has_name : {true, false}) {
         SCOPED_TRACE(has_name);
