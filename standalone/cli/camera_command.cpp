@@ -5,6 +5,7 @@
 #include <cstdio>
 
 #include "standalone/cli/camera_options.h"
+#include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_options.h"
 #include "standalone/cli/table.h"
@@ -47,10 +48,6 @@ Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
     return data;
 }
 
-std::string StateText(const Json::Value& enabled) {
-    return enabled.asBool() ? "enabled" : "disabled";
-}
-
 std::string FeaturesText(const Json::Value& camera) {
     return std::string(camera["ptz"].asBool() ? "PTZ " : "") + (camera["audio"].asBool() ? "audio " : "") +
            (camera["insecure"].asBool() ? "insecure" : "");
@@ -67,7 +64,7 @@ std::string LiveSourceText(const Json::Value& camera) {
 
 constexpr Column kColumns[] = {{"id", "id"},
                                {"name", "name"},
-                               {"state", "enabled", StateText},
+                               {"state", "", CameraStateText},
                                {"video", "video_type", VideoTypeText},
                                {"features", "", FeaturesText},
                                {"recorded", "recording.mode"},
@@ -160,12 +157,11 @@ void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     Camera camera = RequireCamera(cameras, request.id);
-    const store::CameraProfile before = *camera.FindProfile(camera.live_profile);
+    const int live_profile_before = camera.live_profile;
     request.options.ApplyTo(camera);
     RequireSources(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
-    const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
-    if (live != nullptr && live->source != before.source) {
+    if (camera.live_profile != live_profile_before || request.options.HasSource(camera.live_profile)) {
         ProbeMissing(camera, request, request.account ? credentials : cameras.FindCredentials(camera.id));
     }
     RecordingPlan plan = RecordingPlans(store).Find(camera.id);
@@ -181,10 +177,11 @@ void Change(const Console& console, const Request& request) {
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     const std::map<int, RecordingPlan> plans = RecordingPlans(store).List();
+    const CameraStates states(console.Installation());
     Json::Value data = Json::arrayValue;
     for (const Camera& camera : Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
-        data.append(ToData(camera, plan == plans.end() ? RecordingPlan() : plan->second));
+        states.AddTo(data.append(ToData(camera, plan == plans.end() ? RecordingPlan() : plan->second)));
     }
     console.Answer(data, Table(kColumns, data));
 }
