@@ -24,8 +24,8 @@ TEST_F(CliTest, WithoutAnInstallationEveryCommandSaysHowToMakeOneAndWrongUsePoin
     }
     Play({{"--json camera list", 66, "\"code\" : 66"}});
     std::filesystem::create_directory(home_);
-    Play({{"camera list", 69, "run lookhaven init"},
-          {"log show", 66, "run lookhaven init"},
+    Play({{"camera list", 66, "is no state folder"},
+          {"init --home " + folder_.Path().string(), 73, "not empty and is no state folder"},
           {"init --home /proc/none", 73, "--home"},
           {"version", 0, "lookhaven "},
           {"version --json", 0, "\"version\""},
