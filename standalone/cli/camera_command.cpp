@@ -4,6 +4,7 @@
 #include <chrono>
 #include <cstdio>
 
+#include "standalone/base/host_name.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
@@ -12,6 +13,7 @@
 #include "standalone/cli/units.h"
 #include "standalone/media/probe.h"
 #include "standalone/pattern/pattern_source.h"
+#include "standalone/store/change_together.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/text.h"
 
@@ -80,6 +82,11 @@ void RequireSource(const std::string& source) {
         throw Failure(kDataError, "a source begins with ", media::ListKinds(kinds),
                       " and contains no account or password: give the account with --account");
     }
+    const std::size_t host = source.find("://");
+    if (host != source.npos &&
+        !base::IsHostAndPort(source.substr(host + 3, source.find_first_of("/?#", host + 3) - host - 3))) {
+        throw Failure(kDataError, "the source ", source, " names no valid host or port");
+    }
 }
 
 void RequireSources(const Camera& camera) {
@@ -144,11 +151,13 @@ void Add(const Console& console, const Request& request) {
     ProbeMissing(camera, request, credentials);
     RecordingPlan plan;
     request.recording.ApplyTo(plan);
-    camera.id = cameras.Add(camera);
-    if (credentials) {
-        cameras.SetCredentials(camera.id, credentials);
-    }
-    SetPlan(store, camera.id, request, plan);
+    store::ChangeTogether(store, [&] {
+        camera.id = cameras.Add(camera);
+        if (credentials) {
+            cameras.SetCredentials(camera.id, credentials);
+        }
+        SetPlan(store, camera.id, request, plan);
+    });
     console.Answer(ToData(camera, plan), "Added camera ", camera.name, " with id ", camera.id, "; it sends ",
                    VideoTypeName(camera.video_type), ".");
 }
@@ -166,11 +175,13 @@ void Change(const Console& console, const Request& request) {
     }
     RecordingPlan plan = RecordingPlans(store).Find(camera.id);
     request.recording.ApplyTo(plan);
-    SetPlan(store, camera.id, request, plan);
-    cameras.Update(camera);
-    if (request.account) {
-        cameras.SetCredentials(camera.id, credentials);
-    }
+    store::ChangeTogether(store, [&] {
+        SetPlan(store, camera.id, request, plan);
+        cameras.Update(camera);
+        if (request.account) {
+            cameras.SetCredentials(camera.id, credentials);
+        }
+    });
     console.Answer(ToData(camera, plan), "Changed camera ", camera.id, ".");
 }
 

@@ -27,6 +27,7 @@ enum ExitCode : int {
     kOsError = 71,
     kCannotCreate = 73,
     kNoPermission = 77,
+    kConfigError = 78,  // the store's schema is not this program's
 };
 
 // The texts and numbers in a row.

@@ -91,6 +91,8 @@ int Run(int argc, char** argv) {
         return Report(console, kDataError, error.what());
     } catch (const store::NotFound& error) {
         return Report(console, kNoInput, error.what());
+    } catch (const store::SchemaError& error) {
+        return Report(console, kConfigError, error.what());
     } catch (const store::StoreError& error) {
         return Report(console, kUnavailable, error.what());
     } catch (const media::SourceError& error) {
