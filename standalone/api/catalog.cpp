@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see.
+// VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see, and how the cameras are.
 #include "standalone/api/own_apis.h"
 
 #include "platform/camera/camgroup.h"
 #include "platform/privilege/privprofile.h"
 #include "standalone/binding/rights.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/recording_status.h"
+#include "standalone/store/cameras.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
@@ -76,7 +79,42 @@ std::string Emaps(const Call& call) {
     return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {{"Groups", Groups}, {"Mounts", Mounts}, {"Emaps", Emaps}};
+// The sentence may name addresses of the cameras' network, which are a manager's to know.
+Json::Value NoSignal(const maintenance::RecordingStatus& status, bool is_manager) {
+    Json::Value json;
+    json["since"] = status.lost_since_s;
+    json["cause"] = std::string(base::NameOf(status.loss));
+    if (is_manager) {
+        json["reason"] = status.loss_reason;
+    }
+    return json;
+}
+
+// Of the cameras that the caller may watch, those that are recorded or watched now.
+std::string CameraStates(const Call& call) {
+    const bool is_manager = binding::IsManager();
+    const base::Installation& installation = call.context.Installation();
+    const bool is_known = control::FindRecorder(installation) == control::RecorderState::kAlive;
+    Json::Value data;
+    data["recorder"] = is_known;
+    Json::Value& list = data["camera"] = Json::arrayValue;
+    for (const maintenance::RecordingStatus& status :
+         is_known ? maintenance::ReadRecordingStatus(installation) : std::vector<maintenance::RecordingStatus>()) {
+        if (!binding::MayUse(status.camera, store::CameraAccess::kLive)) {
+            continue;
+        }
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = status.camera;
+        json["state"] = maintenance::NameOf(status.state);
+        if (status.lost_since_s > 0) {
+            json["no_signal"] = NoSignal(status, is_manager);
+        }
+    }
+    return SuccessAnswer(data);
+}
+
+constexpr Method kMethods[] = {
+    {"CameraStates", CameraStates}, {"Groups", Groups}, {"Mounts", Mounts}, {"Emaps", Emaps}};
 
 }  // namespace
 

@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/installation.h"
 
-#include <cstdlib>
-
 #include <sys/stat.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/state_folder.h"
 
 namespace lookhaven::base {
 
@@ -33,8 +32,7 @@ Installation::Installation(const std::filesystem::path& home)
       id_(FolderId(home_)) {}
 
 Installation Installation::FromEnvironment() {
-    const char* home = std::getenv("LOOKHAVEN_HOME");
-    return Installation(home != nullptr && *home != '\0' ? home : "var");
+    return Installation(DefaultHome());
 }
 
 void Installation::CreateFolders(const std::filesystem::path& home) {

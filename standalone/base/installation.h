@@ -17,7 +17,7 @@ class Installation {
     // The folder must exist; throws std::system_error otherwise.
     explicit Installation(const std::filesystem::path& home);
 
-    // The folder named by LOOKHAVEN_HOME, else "var" below the working folder.
+    // DefaultHome() of state_folder.h.
     static Installation FromEnvironment();
 
     // Creates the state folder and its subfolders where they are missing, with access for the caller's user only.

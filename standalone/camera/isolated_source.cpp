@@ -89,7 +89,8 @@ class IsolatedSource : public media::Source {
                 throw media::SourceError("stopped");
             }
             if (base::MonotonicMicros() > due_us_ || (received < 0 && error == EAGAIN)) {
-                throw media::SourceError("no picture for " + std::to_string(limit_.count()) + " ms");
+                throw media::SourceError("no picture for " + std::to_string(limit_.count()) + " ms",
+                                         base::SignalLoss::kStalled);
             }
             if (received == 0 || (received < 0 && error != EINTR)) {
                 throw media::SourceError(process_.End());

@@ -51,14 +51,16 @@ void Send(MessageType type, std::span<const std::uint8_t> body = {}, media::Medi
     Send({static_cast<std::uint8_t>(type), static_cast<std::uint8_t>(medium), flags, 0, 0, timestamp_us}, body);
 }
 
-void SendFailure(std::string_view reason) {
+void SendFailure(std::string_view reason, base::SignalLoss cause) {
     const std::string redirect =
         "it redirects to " + RefusedHost() + ", which is not followed: give that address if it is the camera's";
     if (!RefusedHost().empty()) {
         reason = redirect;
+        cause = base::SignalLoss::kOther;
     }
     reason = reason.substr(0, kMaxFailureBytes);
-    Send(MessageType::kFailure, {reinterpret_cast<const std::uint8_t*>(reason.data()), reason.size()});
+    Send(MessageType::kFailure, {reinterpret_cast<const std::uint8_t*>(reason.data()), reason.size()},
+         media::Medium::kVideo, static_cast<std::uint8_t>(cause));
 }
 
 Request Receive() {
@@ -108,8 +110,10 @@ int main() {
         const Request request = Receive();  // also ends a process whose recorder died before the line above
         Confine();
         Run(request);
+    } catch (const media::SourceError& failure) {
+        SendFailure(failure.what(), failure.Cause());
     } catch (const std::exception& failure) {
-        SendFailure(failure.what());
+        SendFailure(failure.what(), base::SignalLoss::kOther);
     }
     // Nothing to unwind, and the confinement would fail what a sanitizer does at the end.
     ::_exit(EX_OK);

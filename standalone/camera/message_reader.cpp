@@ -89,7 +89,10 @@ MessageHead MessageReader::ReadMessage() {
         input_({buffer_.data(), head.body_bytes});
     }
     if (IsType(head, MessageType::kFailure)) {
-        throw media::SourceError(Printable(Body(head)));
+        if (head.flags >= base::kSignalLossNames.size()) {
+            Refuse("an unknown cause");
+        }
+        throw media::SourceError(Printable(Body(head)), static_cast<base::SignalLoss>(head.flags));
     }
     return head;
 }

@@ -27,7 +27,7 @@ enum class MessageType : std::uint8_t { kConfined = 1, kFormat, kOpened, kFrame,
 struct MessageHead {
     std::uint8_t type = 0;
     std::uint8_t medium = 0;  // of kFormat and kFrame: a base::Medium
-    std::uint8_t flags = 0;   // of kConfined and kFrame
+    std::uint8_t flags = 0;   // of kConfined and kFrame; of kFailure, a base::SignalLoss
     std::uint8_t unused = 0;
     std::uint32_t body_bytes = 0;
     std::int64_t timestamp_us = 0;  // of kFrame

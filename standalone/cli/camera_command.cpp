@@ -4,13 +4,16 @@
 #include <chrono>
 #include <cstdio>
 
+#include "standalone/base/host_name.h"
 #include "standalone/cli/camera_options.h"
+#include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_options.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/media/probe.h"
 #include "standalone/pattern/pattern_source.h"
+#include "standalone/store/change_together.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/text.h"
 
@@ -47,10 +50,6 @@ Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
     return data;
 }
 
-std::string StateText(const Json::Value& enabled) {
-    return enabled.asBool() ? "enabled" : "disabled";
-}
-
 std::string FeaturesText(const Json::Value& camera) {
     return std::string(camera["ptz"].asBool() ? "PTZ " : "") + (camera["audio"].asBool() ? "audio " : "") +
            (camera["insecure"].asBool() ? "insecure" : "");
@@ -67,7 +66,7 @@ std::string LiveSourceText(const Json::Value& camera) {
 
 constexpr Column kColumns[] = {{"id", "id"},
                                {"name", "name"},
-                               {"state", "enabled", StateText},
+                               {"state", "", CameraStateText},
                                {"video", "video_type", VideoTypeText},
                                {"features", "", FeaturesText},
                                {"recorded", "recording.mode"},
@@ -82,6 +81,11 @@ void RequireSource(const std::string& source) {
     if (media::FindKind(kinds, source) == nullptr || !store::IsSource(source)) {
         throw Failure(kDataError, "a source begins with ", media::ListKinds(kinds),
                       " and contains no account or password: give the account with --account");
+    }
+    const std::size_t host = source.find("://");
+    if (host != source.npos &&
+        !base::IsHostAndPort(source.substr(host + 3, source.find_first_of("/?#", host + 3) - host - 3))) {
+        throw Failure(kDataError, "the source ", source, " names no valid host or port");
     }
 }
 
@@ -147,11 +151,13 @@ void Add(const Console& console, const Request& request) {
     ProbeMissing(camera, request, credentials);
     RecordingPlan plan;
     request.recording.ApplyTo(plan);
-    camera.id = cameras.Add(camera);
-    if (credentials) {
-        cameras.SetCredentials(camera.id, credentials);
-    }
-    SetPlan(store, camera.id, request, plan);
+    store::ChangeTogether(store, [&] {
+        camera.id = cameras.Add(camera);
+        if (credentials) {
+            cameras.SetCredentials(camera.id, credentials);
+        }
+        SetPlan(store, camera.id, request, plan);
+    });
     console.Answer(ToData(camera, plan), "Added camera ", camera.name, " with id ", camera.id, "; it sends ",
                    VideoTypeName(camera.video_type), ".");
 }
@@ -160,31 +166,33 @@ void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     Camera camera = RequireCamera(cameras, request.id);
-    const store::CameraProfile before = *camera.FindProfile(camera.live_profile);
+    const int live_profile_before = camera.live_profile;
     request.options.ApplyTo(camera);
     RequireSources(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
-    const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
-    if (live != nullptr && live->source != before.source) {
+    if (camera.live_profile != live_profile_before || request.options.HasSource(camera.live_profile)) {
         ProbeMissing(camera, request, request.account ? credentials : cameras.FindCredentials(camera.id));
     }
     RecordingPlan plan = RecordingPlans(store).Find(camera.id);
     request.recording.ApplyTo(plan);
-    SetPlan(store, camera.id, request, plan);
-    cameras.Update(camera);
-    if (request.account) {
-        cameras.SetCredentials(camera.id, credentials);
-    }
+    store::ChangeTogether(store, [&] {
+        SetPlan(store, camera.id, request, plan);
+        cameras.Update(camera);
+        if (request.account) {
+            cameras.SetCredentials(camera.id, credentials);
+        }
+    });
     console.Answer(ToData(camera, plan), "Changed camera ", camera.id, ".");
 }
 
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     const std::map<int, RecordingPlan> plans = RecordingPlans(store).List();
+    const CameraStates states(console.Installation());
     Json::Value data = Json::arrayValue;
     for (const Camera& camera : Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
-        data.append(ToData(camera, plan == plans.end() ? RecordingPlan() : plan->second));
+        states.AddTo(data.append(ToData(camera, plan == plans.end() ? RecordingPlan() : plan->second)));
     }
     console.Answer(data, Table(kColumns, data));
 }

@@ -23,6 +23,8 @@ class CameraOptions {
 
     bool HasType() const { return type_.has_value(); }
     bool HasAudio() const { return audio_.has_value(); }
+    // Of the profile of that number; also where it is the same as before.
+    bool HasSource(int profile) const { return profiles_[static_cast<std::size_t>(profile)].source.has_value(); }
 
   private:
     struct ProfileOptions {

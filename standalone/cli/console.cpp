@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/console.h"
 
-#include <cstdlib>
 #include <iostream>
 
 #include <grp.h>
 #include <sys/stat.h>
 #include <termios.h>
 #include <unistd.h>
+
+#include "standalone/base/state_folder.h"
 
 namespace lookhaven::cli {
 
@@ -52,11 +53,7 @@ std::string Ask(const std::string& prompt) {
 }  // namespace
 
 std::string Console::HomePath() const {
-    if (!home_option.empty()) {
-        return home_option;
-    }
-    const char* home = std::getenv("LOOKHAVEN_HOME");
-    return home != nullptr && *home != '\0' ? home : "var";
+    return home_option.empty() ? base::DefaultHome().string() : home_option;
 }
 
 void Console::BecomeOwner() const {
@@ -76,6 +73,10 @@ base::Installation Console::Installation() const {
     if (::access(home.c_str(), F_OK) != 0) {
         throw Failure(kNoInput, "there is no state folder at ", home,
                       ": create it with lookhaven init, or name another with --home");
+    }
+    if (::access(home.c_str(), R_OK | X_OK) == 0 && !base::IsStateFolder(home)) {
+        throw Failure(kNoInput, "the folder ", home,
+                      " is no state folder: make one with lookhaven init, or name another with --home");
     }
     return base::Installation(home);
 }

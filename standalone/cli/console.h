@@ -27,6 +27,7 @@ enum ExitCode : int {
     kOsError = 71,
     kCannotCreate = 73,
     kNoPermission = 77,
+    kConfigError = 78,  // the store's schema is not this program's
 };
 
 // The texts and numbers in a row.
@@ -60,14 +61,14 @@ Record Require(std::optional<Record> record, const Parts&... parts) {
 
 class Console {
   public:
-    std::string home_option;  // empty: LOOKHAVEN_HOME, else "var"
+    std::string home_option;  // empty: the default
     bool json = false;
 
     std::string HomePath() const;
     // Root becomes the owner of the state folder for good, so that it leaves no files there that the server, which runs as
     // that user, could not use. Does nothing where there is no folder yet. Throws Failure.
     void BecomeOwner() const;
-    // BecomeOwner first. Throws Failure when there is no state folder.
+    // BecomeOwner first. Throws Failure when there is no folder, or one of something else.
     base::Installation Installation() const;
     // Throws Failure when the state folder is missing or not the caller's to change.
     store::Store OpenStore() const;

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/mount_claim.h"
@@ -21,7 +22,18 @@ struct Request {
     std::string admin;
 };
 
+// Where other things lie, neither our files belong nor is anything ours to change.
+void RequireOwnFolder(const std::string& home) {
+    std::error_code error;
+    if (!base::IsStateFolder(home) && std::filesystem::exists(home, error) && !std::filesystem::is_empty(home, error) &&
+        !error) {
+        throw Failure(kCannotCreate, "the folder ", home,
+                      " is not empty and is no state folder: choose another with --home");
+    }
+}
+
 base::Installation CreateFolders(const std::string& home) {
+    RequireOwnFolder(home);
     try {
         base::Installation::CreateFolders(home);
         base::Installation installation(home);

@@ -6,6 +6,7 @@
 #include <system_error>
 
 #include "standalone/archive/archive_error.h"
+#include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/media/source.h"
@@ -70,7 +71,8 @@ int Run(int argc, char** argv) {
     CLI::App program("Sets up and maintains a Lookhaven installation.", "lookhaven");
     program.fallthrough();
     program.require_subcommand(1);
-    program.add_option("--home", console.home_option, "The state folder (default: $LOOKHAVEN_HOME, else var)");
+    program.add_option("--home", console.home_option,
+                       "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
     for (const auto add : {AddInit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddEmap, AddDevices,
                            AddServer, AddSetting, AddVerify, AddDemo, AddDoctor}) {
@@ -89,6 +91,8 @@ int Run(int argc, char** argv) {
         return Report(console, kDataError, error.what());
     } catch (const store::NotFound& error) {
         return Report(console, kNoInput, error.what());
+    } catch (const store::SchemaError& error) {
+        return Report(console, kConfigError, error.what());
     } catch (const store::StoreError& error) {
         return Report(console, kUnavailable, error.what());
     } catch (const media::SourceError& error) {

@@ -6,12 +6,14 @@
 
 #include <unistd.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/mount_claim.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 
@@ -32,6 +34,7 @@ struct Request {
     bool make_default = false;
     bool take_over = false;
     bool forget = false;
+    bool yes = false;
 };
 
 Json::Value ToData(const Mount& mount) {
@@ -107,10 +110,24 @@ void Add(const Console& console, const Request& request) {
     console.Answer(ToData(*Mounts(store).Find(mount.id)), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
+// The recorder deletes within seconds what a lower limit leaves no room for.
+void RequireConfirmation(store::Store& store, const Mount& before, const Mount& after) {
+    const std::int64_t now_s = base::WallSeconds();
+    const maintenance::RetentionForecast loss = maintenance::ForecastRetention(store, after, now_s);
+    if (loss.events > maintenance::ForecastRetention(store, before, now_s).events) {
+        throw Failure(kDataError, "this limit deletes the ", loss.events, " oldest recordings (",
+                      FormatSize(loss.bytes), "), up to ", FormatMoment(loss.end_s), "; add --yes to confirm");
+    }
+}
+
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Mount mount = Require(Mounts(store).Find(request.id), "there is no mount ", request.id);
+    const Mount before = Require(Mounts(store).Find(request.id), "there is no mount ", request.id);
+    Mount mount = before;
     Apply(mount, request);
+    if (!request.yes) {
+        RequireConfirmation(store, before, mount);
+    }
     const bool is_marked = !request.path.empty() || request.take_over;
     if (is_marked) {
         RequireFreeFolder(store, RequireFolder(mount.path), mount.id, request.take_over);
@@ -179,7 +196,8 @@ void AddMount(CLI::App& program, const Console& console) {
     add_properties(add);
     Command set = group.Add("set", "Changes the given properties of a mount", Change)
                       .Option("id", request.id, "The mount's id", Required)
-                      .Option("--path", request.path, "The folder's new path");
+                      .Option("--path", request.path, "The folder's new path")
+                      .Flag("--yes", request.yes, "Also where a lower limit deletes recordings");
     add_properties(set);
     group.Add("list", "Lists the mounts and what they hold", List);
     group.Add("remove", "Removes a mount from the store; its files stay", Remove)

@@ -5,20 +5,19 @@
 // Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one
 //               that is to show them: the host's address and certificate, its cameras, and a secret that only the two
 //               share.
-#include <future>
 #include <iostream>
+#include <optional>
 
 #include <unistd.h>
 
-#include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/base/host_name.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
+#include "standalone/cli/paired_host.h"
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
-#include "standalone/remote/fetch.h"
-#include "standalone/remote/pair_token.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 
@@ -39,6 +38,12 @@ struct Request {
     std::string name;
     std::string address;
     int port = kDefaultPort;
+    struct {
+        std::optional<std::string> name;
+        std::optional<std::string> address;
+        std::optional<int> port;
+        std::optional<bool> enabled;
+    } change;
 };
 
 Json::Value ToData(const RecordingServer& server) {
@@ -76,11 +81,14 @@ std::vector<RemoteCamera> OwnCameras(store::Store& store) {
 
 // Only the line itself goes to standard output, so that it can be redirected.
 void Pair(const Console& console, const Request& request) {
+    const std::string address = request.address.empty() ? HostName() : request.address;
+    if (!base::IsHost(address)) {
+        throw Failure(kDataError, "the address ", address, " is neither a host name nor the number of a host");
+    }
     store::Store store = console.OpenStore();
     const std::string certificate =
         remote::CertificatesIn(base::ReadFile(console.Installation().TlsFolder() / "certificate.pem"));
-    const PairOffer offer{request.address.empty() ? HostName() : request.address, request.port, certificate,
-                          store::RandomHex(kSecretBytes), OwnCameras(store)};
+    const PairOffer offer{address, request.port, certificate, store::RandomHex(kSecretBytes), OwnCameras(store)};
     RecordingServer watcher;
     watcher.name = request.name;
     watcher.id = RecordingServers(store).Pair(watcher, offer.secret, {});
@@ -103,6 +111,15 @@ std::string ReadPairText() {
     return line;
 }
 
+// Empty when the host answers; else why it does not and what to do, without which the pairing is of no use.
+std::string Trial(const RecordingServer& server, const std::string& secret) {
+    const std::string failure = AskPairedHost(server, secret).failure;
+    return failure.empty() ? ""
+                           : Concat("\nIt does not answer at ", server.address, " port ", server.port, ": ", failure,
+                                    ".\nThe pairing is kept; where address or port is another: lookhaven server set ",
+                                    server.id, " --address ADDRESS --port PORT");
+}
+
 void Add(const Console& console, const Request& request) {
     const PairOffer offer = ParsePairText(ReadPairText());
     remote::CertificateName(offer.certificate);  // throws before anything is stored
@@ -113,8 +130,28 @@ void Add(const Console& console, const Request& request) {
                            .port = offer.port,
                            .certificate = remote::CertificatesIn(offer.certificate)};
     server.id = servers.Pair(server, offer.secret, offer.cameras);
-    console.Answer(ToData(server), "Added server ", server.name, " with id ", server.id, " and ", offer.cameras.size(),
-                   " cameras.");
+    const std::string trouble = Trial(server, offer.secret);
+    Json::Value data = ToData(server);
+    data["answers"] = trouble.empty();
+    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", offer.cameras.size(),
+                   " cameras.", trouble);
+}
+
+// Secret, certificate and cameras stay.
+void Change(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    RecordingServers servers(store);
+    RecordingServer server = Require(servers.Find(request.id), "there is no server ", request.id);
+    server.name = request.change.name.value_or(server.name);
+    server.enabled = request.change.enabled.value_or(server.enabled);
+    server.address = request.change.address.value_or(server.address);
+    server.port = request.change.port.value_or(server.port);
+    servers.Update(server);
+    const bool is_tried = server.enabled && !server.address.empty();
+    const std::string trouble = is_tried ? Trial(server, servers.FindSecret(server.id)) : "";
+    Json::Value data = ToData(server);
+    data["answers"] = is_tried && trouble.empty();
+    console.Answer(data, "Changed server ", server.name, ".", trouble);
 }
 
 void List(const Console& console) {
@@ -167,33 +204,23 @@ void ListCameras(const Console& console) {
     console.Answer(data, Table(kCameraColumns, data));
 }
 
-std::vector<RemoteCamera> AskForCameras(const RecordingServer& server, const std::string& secret) {
-    const std::string timestamp = std::to_string(base::WallSeconds());
-    const std::string token = remote::MakePairToken(secret, timestamp);
-    return CamerasInAnswer(remote::FetchJson(
-        {server.address, server.port, server.certificate},
-        {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));
-}
-
-// All are asked at once, so that one that fails or is slow keeps no other from being asked.
 void Refresh(const Console& console) {
     store::Store store = console.OpenStore();
     RecordingServers servers(store);
-    std::vector<std::pair<RecordingServer, std::future<std::vector<RemoteCamera>>>> asked;
-    for (const RecordingServer& server : servers.List()) {
-        if (server.enabled && !server.address.empty()) {
-            asked.emplace_back(server,
-                               std::async(std::launch::async, AskForCameras, server, servers.FindSecret(server.id)));
-        }
-    }
     Json::Value data = Json::arrayValue;
     std::string failures;
-    for (auto& [server, cameras] : asked) {
+    const auto note = [&](const RecordingServer& server, const std::string& failure) {
+        failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure);
+    };
+    for (const auto& [server, cameras, failure] : AskPairedHosts(store)) {
+        if (!failure.empty()) {
+            note(server, failure);
+            continue;
+        }
         try {
-            data.append(
-                Object("id", server.id, "name", server.name, "new", servers.PutCameras(server.id, cameras.get())));
-        } catch (const std::exception& failure) {
-            failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure.what());
+            data.append(Object("id", server.id, "name", server.name, "new", servers.PutCameras(server.id, cameras)));
+        } catch (const std::exception& refusal) {
+            note(server, refusal.what());
         }
     }
     if (!failures.empty()) {
@@ -211,12 +238,18 @@ void AddServer(CLI::App& program, const Console& console) {
     group.Add("pair", "Lets another host show this one's cameras, or renews that: prints a line to enter there", Pair)
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "This host's address for the other one (default: its host name)")
-        .Option("--port", request.port, "This host's HTTPS port (default: 8443)");
+        .Option("--port", request.port, "This host's HTTPS port (default: 8443)", Satisfies(CLI::Range(1, 65535)));
     group
         .Add("add", "Reads the line of a host whose cameras are to be shown from standard input, also of a known host",
              Add)
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "The other host's address (default: as in the line)");
+    group.Add("set", "Changes where a host is reached, or what it is called, without pairing anew", Change)
+        .Option("id", request.id, "The host's id", Required)
+        .Option("--name", request.change.name, name)
+        .Option("--address", request.change.address, "Its address")
+        .Option("--port", request.change.port, "Its HTTPS port", Satisfies(CLI::Range(1, 65535)))
+        .Switch("--enable,!--disable", request.change.enabled, "Whether the two hosts may ask each other");
     group.Add("list", "Lists the hosts", List);
     group.Add("cameras", "Lists the cameras of other hosts with their ids here", ListCameras);
     group.Add("refresh", "Asks the hosts for cameras that were added there", Refresh);

@@ -44,7 +44,7 @@ std::optional<std::int64_t> ParseDate(std::string text) {
 
 std::int64_t ParseDuration(const std::string& text) {
     const std::size_t digits = text.find_first_not_of("0123456789");
-    const std::string unit = digits == std::string::npos ? "s" : text.substr(digits);
+    const std::string unit = digits != std::string::npos ? text.substr(digits) : text == "0" ? "s" : "";
     const std::int64_t factor = unit == "s" ? 1 : unit == "m" ? 60 : unit == "h" ? 3600 : unit == "d" ? 86400 : 0;
     const auto number = ParseQuantity<std::int64_t>(std::string_view(text).substr(0, digits));
     if (!number || factor == 0 || *number > kMaxNumber / factor) {
@@ -59,7 +59,7 @@ std::int64_t ParseSize(const std::string& text) {
     const bool has_unit = unit != std::string_view::npos;
     const auto number = ParseQuantity<double>(std::string_view(text).substr(0, text.size() - (has_unit ? 1 : 0)));
     const double bytes = number.value_or(-1) * std::pow(1024, has_unit ? static_cast<double>(unit + 1) : 0);
-    if (!(bytes >= 0 && bytes <= static_cast<double>(kMaxNumber))) {
+    if (!(bytes >= 0 && bytes <= static_cast<double>(kMaxNumber)) || (!has_unit && bytes != 0)) {
         throw Failure(kUsage, "a size looks like 500M, 4G or 1.5T");
     }
     return static_cast<std::int64_t>(bytes);

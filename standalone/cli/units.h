@@ -22,9 +22,9 @@ std::optional<Number> ParseNumber(std::string_view text) {
 // "now"; "-2h" before now; seconds since the epoch; "2026-03-01", "2026-03-01 08:15" or "2026-03-01T08:15:30" in the
 // host's time zone, in UTC with a "Z" behind. UTC seconds. These three throw Failure for another form.
 std::int64_t ParseMoment(const std::string& text, std::int64_t now_s);
-// "90", "90s", "15m", "2h", "30d": seconds.
+// "90s", "15m", "2h", "30d", "0": seconds.
 std::int64_t ParseDuration(const std::string& text);
-// "500000", "64K", "500M", "4G", "1.5T": bytes, in powers of 1024.
+// "64K", "500M", "4G", "1.5T", "0": bytes, in powers of 1024.
 std::int64_t ParseSize(const std::string& text);
 
 // "2026-03-01 08:15:30" in the host's time zone.

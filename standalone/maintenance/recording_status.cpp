@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 #include <filesystem>
+#include <optional>
 #include <sstream>
 #include <utility>
 
@@ -13,7 +14,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr std::array<std::pair<RecordingState, const char*>, 7> kNames{{
+constexpr std::array<std::pair<RecordingState, const char*>, 8> kNames{{
     {RecordingState::kReady, "ready"},
     {RecordingState::kRecording, "recording"},
     {RecordingState::kDiskFull, "disk-full"},
@@ -21,10 +22,38 @@ constexpr std::array<std::pair<RecordingState, const char*>, 7> kNames{{
     {RecordingState::kMountGone, "mount-gone"},
     {RecordingState::kNoMount, "no-mount"},
     {RecordingState::kNoEventId, "no-number"},
+    {RecordingState::kNoSignal, "no-signal"},
 }};
 
 std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "recordings";
+}
+
+std::string WithoutBreaks(std::string text) {
+    std::ranges::replace_if(
+        text, [](char c) { return c == '\n' || c == '\t'; }, ' ');
+    return text;
+}
+
+// Nothing for a line that an older recorder wrote.
+std::optional<RecordingStatus> Parse(const std::string& line) {
+    std::istringstream fields(line);
+    RecordingStatus status;
+    std::string state;
+    std::string loss;
+    if (!(fields >> status.camera >> state >> status.event >> status.dropped_frames >> status.lost_since_s >> loss)) {
+        return std::nullopt;
+    }
+    const auto* const name = std::ranges::find(kNames, state, &std::pair<RecordingState, const char*>::second);
+    const std::optional<base::SignalLoss> known_loss = base::SignalLossOf(loss);
+    if (name == kNames.end() || !known_loss) {
+        return std::nullopt;
+    }
+    status.state = name->first;
+    status.loss = *known_loss;
+    std::getline(fields.ignore(), status.camera_name, '\t');
+    std::getline(fields, status.loss_reason);
+    return status;
 }
 
 }  // namespace
@@ -36,10 +65,9 @@ const char* NameOf(RecordingState state) {
 void WriteRecordingStatus(const base::Installation& installation, const std::vector<RecordingStatus>& cameras) {
     std::ostringstream text;
     for (const RecordingStatus& each : cameras) {
-        std::string name = each.camera_name;
-        std::ranges::replace(name, '\n', ' ');
         text << each.camera << ' ' << NameOf(each.state) << ' ' << each.event << ' ' << each.dropped_frames << ' '
-             << name << '\n';
+             << each.lost_since_s << ' ' << base::NameOf(each.loss) << ' ' << WithoutBreaks(each.camera_name) << '\t'
+             << WithoutBreaks(each.loss_reason) << '\n';
     }
     base::WriteFileAtomically(PathOf(installation), text.str());
 }
@@ -52,18 +80,8 @@ std::vector<RecordingStatus> ReadRecordingStatus(const base::Installation& insta
     }
     std::istringstream text(base::ReadFile(PathOf(installation)));
     for (std::string line; std::getline(text, line);) {
-        std::istringstream fields(line);
-        RecordingStatus each;
-        std::string state;
-        if (!(fields >> each.camera >> state >> each.event >> each.dropped_frames)) {
-            continue;
-        }
-        std::getline(fields >> std::ws, each.camera_name);
-        for (const auto& [value, name] : kNames) {
-            if (state == name) {
-                each.state = value;
-                cameras.push_back(each);
-            }
+        if (const std::optional<RecordingStatus> status = Parse(line)) {
+            cameras.push_back(*status);
         }
     }
     return cameras;

@@ -252,6 +252,29 @@ class Retention {
 
 }  // namespace
 
+RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
+    store::Events events(store);
+    RetentionForecast forecast;
+    const std::int64_t excess_bytes = mount.max_bytes > 0 ? events.Content(mount.id).size_bytes - mount.max_bytes : 0;
+    const std::int64_t keep_from_s = mount.max_age_s > 0 ? now_s - mount.max_age_s : 0;
+    int after = 0;
+    for (;;) {
+        const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsAtOnce);
+        for (const store::Event& event : oldest) {
+            after = event.id;
+            if (forecast.bytes >= excess_bytes && event.end_s > keep_from_s) {
+                return forecast;
+            }
+            ++forecast.events;
+            forecast.bytes += event.size_bytes;
+            forecast.end_s = std::max(forecast.end_s, event.end_s);
+        }
+        if (oldest.size() < kEventsAtOnce) {
+            return forecast;
+        }
+    }
+}
+
 RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
                                  AgeLimit age_limit) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);

@@ -39,4 +39,12 @@ RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount,
 // Finishes the deletions that a crash interrupted on the mount. Throws as EnforceRetention.
 void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s);
 
+// What the mount's own limits would have EnforceRetention delete by and by, without what a full disk adds.
+struct RetentionForecast {
+    std::int64_t events = 0;
+    std::int64_t bytes = 0;
+    std::int64_t end_s = 0;  // of the youngest event
+};
+RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s);
+
 }  // namespace lookhaven::maintenance

@@ -2,6 +2,7 @@
 #include "standalone/media/libav.h"
 
 #include <array>
+#include <cerrno>
 #include <mutex>
 #include <utility>
 
@@ -22,8 +23,9 @@ namespace {
 // Twice the samples of a plane, because of padding.
 constexpr std::size_t kMaxBlockBytes = std::size_t{2} * base::kMaxSidePixels * base::kMaxSidePixels;
 
-// Its error code says no more than "Input/output error".
+// libav's error code says no more than "Input/output error" of these.
 thread_local std::string certificate_problem;
+thread_local bool is_host_unknown = false;
 
 void WriteAvLog(void* object, int level, const char* format, va_list arguments) {
     if (level > AV_LOG_WARNING) {
@@ -37,16 +39,37 @@ void WriteAvLog(void* object, int level, const char* format, va_list arguments) 
         const std::size_t begin = text.find("] ") + 2;
         certificate_problem = text.substr(begin, text.find_last_not_of('\n') + 1 - begin);
     }
+    is_host_unknown |= text.find("Failed to resolve hostname") != text.npos;
     base::Log(base::Severity::kDebug, RedactSecrets(text));
+}
+
+base::SignalLoss CauseOf(int error) {
+    switch (error) {
+    case AVERROR(ECONNREFUSED):
+        return base::SignalLoss::kRefused;
+    case AVERROR(EHOSTUNREACH):
+    case AVERROR(ENETUNREACH):
+    case AVERROR(ETIMEDOUT):
+        return base::SignalLoss::kUnreachable;
+    case AVERROR_HTTP_UNAUTHORIZED:
+    case AVERROR_HTTP_FORBIDDEN:
+        return base::SignalLoss::kWrongPassword;
+    default:
+        return base::SignalLoss::kOther;
+    }
 }
 
 }  // namespace
 
 int CheckAv(int result, std::string_view what) {
+    const bool is_unresolved = std::exchange(is_host_unknown, false);
     if (result < 0) {
+        if (result == AVERROR(EIO) && is_unresolved) {
+            throw SourceError(std::string(what) + ": the host name cannot be resolved", base::SignalLoss::kUnknownHost);
+        }
         std::array<char, AV_ERROR_MAX_STRING_SIZE> text{};
         av_strerror(result, text.data(), text.size());
-        throw SourceError(std::string(what) + ": " + text.data());
+        throw SourceError(std::string(what) + ": " + text.data(), CauseOf(result));
     }
     return result;
 }
@@ -82,7 +105,7 @@ void Deadline::Check() const {
         throw SourceError("stopped");
     }
     if (IsPast()) {
-        throw SourceError("no picture for " + std::to_string(limit_us_ / 1000) + " ms");
+        throw SourceError("no picture for " + std::to_string(limit_us_ / 1000) + " ms", base::SignalLoss::kStalled);
     }
 }
 

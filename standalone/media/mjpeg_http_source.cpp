@@ -60,8 +60,9 @@ class MjpegHttpSource : public Source {
             deadline_.Check();
             if (const std::string problem = TakeCertificateProblem(); !problem.empty()) {
                 throw SourceError("its TLS certificate is refused (" + problem +
-                                  "): have an authority that this machine trusts sign it, or accept any certificate"
-                                  " of this camera with --insecure");
+                                      "): have an authority that this machine trusts sign it, or accept any certificate"
+                                      " of this camera with --insecure",
+                                  base::SignalLoss::kCertificate);
             }
             CheckAv(opened, "cannot open");
         }

@@ -18,6 +18,7 @@
 #include <string>
 #include <string_view>
 
+#include "standalone/base/signal_loss.h"
 #include "standalone/media/packet.h"
 
 namespace lookhaven::media {
@@ -25,7 +26,13 @@ namespace lookhaven::media {
 // Why a source cannot be opened or read on, in one sentence without credentials.
 class SourceError : public std::runtime_error {
   public:
-    using std::runtime_error::runtime_error;
+    explicit SourceError(const std::string& sentence, base::SignalLoss cause = base::SignalLoss::kOther)
+        : std::runtime_error(sentence),
+          cause_(cause) {}
+    base::SignalLoss Cause() const { return cause_; }
+
+  private:
+    base::SignalLoss cause_;
 };
 
 // The login of the camera; empty when it needs none. Kept out of the URL so that no log can show it.

@@ -3,6 +3,7 @@
 
 #include <utility>
 
+#include "standalone/base/log.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/settings.h"
 
@@ -20,9 +21,16 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
         plan = found->second;
     }
     const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
-    CameraPlan result{
-        camera.name, plan.mode, plan.segment_s, plan.pre_s, has_profile ? plan.profile : camera.live_profile, 0,
-        {},          {}};
+    CameraPlan result{camera.name,
+                      plan.mode,
+                      plan.segment_s,
+                      plan.pre_s,
+                      has_profile ? plan.profile : camera.live_profile,
+                      0,
+                      {},
+                      {},
+                      camera.live_profile,
+                      camera.video_type};
     if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id); mount && mount->enabled) {
         result.mount_id = mount->id;
         result.mount = mount->path;
@@ -41,7 +49,29 @@ std::shared_ptr<const CatalogContents> Catalog::Current() const {
     return current_;
 }
 
+void Catalog::CorrectVideoType(int camera, base::Codec type) {
+    const std::lock_guard lock(mutex_);
+    corrections_[camera] = type;
+}
+
+// A store that can only be read is read all the same.
+void Catalog::WriteVideoTypes(store::Store& store) {
+    std::map<int, base::Codec> corrections;
+    {
+        const std::lock_guard lock(mutex_);
+        corrections.swap(corrections_);
+    }
+    for (const auto& [camera, type] : corrections) {
+        try {
+            store::Cameras(store).SetVideoType(camera, type);
+        } catch (const store::StoreError& failure) {
+            base::Log(base::Severity::kDebug, std::string("cannot store what a camera sends: ") + failure.what());
+        }
+    }
+}
+
 void Catalog::Read(store::Store& store) {
+    WriteVideoTypes(store);
     // Read before the cameras: a change in between is then seen the next time.
     const std::int64_t revision = store::Settings(store).Revision();
     if (revision == revision_) {

@@ -33,7 +33,9 @@ struct CameraPlan {
     int stream = 0;    // the profile that is recorded
     int mount_id = 0;  // 0: there is none to record to
     std::filesystem::path mount;
-    std::string installation;  // whose mounts are recorded to
+    std::string installation;                      // whose mounts are recorded to
+    int live_stream = 0;                           // the profile that the live view shows, and …
+    base::Codec video_type = base::Codec::kMjpeg;  // … what the store says that it sends
 };
 
 struct CatalogContents {
@@ -52,6 +54,9 @@ class Catalog {
     // Has the store read again if its revision changed; does not wait.
     void Refresh() { thread_.Ask(); }
 
+    // Has the store say what the camera's live view really is; does not wait.
+    void CorrectVideoType(int camera, base::Codec type);
+
     // What was read last; empty before the first read, never null.
     std::shared_ptr<const CatalogContents> Current() const;
 
@@ -61,10 +66,12 @@ class Catalog {
 
   private:
     void Read(store::Store& store);
+    void WriteVideoTypes(store::Store& store);
 
     const std::function<void()> on_change_;
     std::optional<std::int64_t> revision_;  // the thread's alone
     mutable std::mutex mutex_;
+    std::map<int, base::Codec> corrections_;  // of the video types, by camera
     std::shared_ptr<const CatalogContents> current_ = std::make_shared<CatalogContents>();
     StoreThread thread_;  // last: it uses the others
 };

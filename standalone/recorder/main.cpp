@@ -14,6 +14,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/base/state_folder.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/instance_lock.h"
 #include "standalone/recorder/supervisor.h"
@@ -61,7 +62,7 @@ int main(int argc, char** argv) {
     CLI::App app("Receives the cameras' streams, records them and passes them to viewers.", "lookhaven-recorder");
     std::string home;
     double no_data_limit_s = 10;
-    app.add_option("--home", home, "State folder; else LOOKHAVEN_HOME, else ./var");
+    app.add_option("--home", home, "State folder (default: " + base::DefaultHome().string() + ")");
     app.add_option("--no-data-limit", no_data_limit_s,
                    "Seconds without a picture after which the recorder reconnects to a camera")
         ->check(CLI::Range(0.1, 600.0))

@@ -25,7 +25,13 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(),
                                                    [this](const store::Mark& mark) { return FootageHasEnded(mark); });
-                    }) {}
+                    }) {
+    for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+        if (status.lost_since_s > 0) {
+            lost_since_s_.emplace(status.camera, status.lost_since_s);
+        }
+    }
+}
 
 // The cameras that a pending mark needs footage of now, and until when.
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
@@ -102,13 +108,39 @@ void RecordingSupervisor::AnswerFlushes() {
     }
 }
 
-void RecordingSupervisor::DoEverySecond() {
+// A camera that is down is told so, whether anything is to be recorded of it or not.
+std::vector<maintenance::RecordingStatus>
+RecordingSupervisor::CameraStates(const std::map<int, CameraSignal>& signals) {
+    std::map<int, maintenance::RecordingStatus> states;
+    for (const auto& [camera, entry] : entries_) {
+        states.emplace(camera, entry.worker->State());
+    }
+    for (const auto& [camera, signal] : signals) {
+        maintenance::RecordingStatus& status = states[camera];
+        status.camera = camera;
+        status.camera_name = signal.camera_name;
+        if (signal.stream.codec) {
+            lost_since_s_.erase(camera);
+        } else if (!signal.stream.reason.empty()) {
+            status.lost_since_s = lost_since_s_.try_emplace(camera, base::WallSeconds()).first->second;
+            status.loss = signal.stream.loss;
+            status.loss_reason = signal.stream.reason;
+            if (status.state == maintenance::RecordingState::kReady) {
+                status.state = maintenance::RecordingState::kNoSignal;
+            }
+        }
+    }
+    std::vector<maintenance::RecordingStatus> list;
+    for (const auto& [camera, status] : states) {
+        list.push_back(status);
+    }
+    return list;
+}
+
+void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
     missed_marks_.Ask();
-    RecordingReport::States states;
-    for (const auto& [camera, entry] : entries_) {
-        states.cameras.push_back(entry.worker->State());
-    }
+    RecordingReport::States states{CameraStates(signals), {}};
     for (const auto& [id, mount] : mounts_) {
         mount->Ask();
         states.mounts.push_back(mount->Status());

@@ -18,6 +18,13 @@
 
 namespace lookhaven::recorder {
 
+// What comes from a camera: from the stream that is recorded, else from one that fails, if any does.
+struct CameraSignal {
+    std::string camera_name;
+    bool is_recorded = false;
+    StreamSignal stream;
+};
+
 class RecordingSupervisor {
   public:
     // The installation must outlive this object. Throws std::system_error.
@@ -25,7 +32,8 @@ class RecordingSupervisor {
 
     // Starts, changes and stops workers to match the catalog and the pending marks.
     void Reconcile(const CatalogContents& catalog);
-    void DoEverySecond();
+    // signals: of the cameras that are connected to, by id.
+    void DoEverySecond(const std::map<int, CameraSignal>& signals);
 
     // The streams that must run because they are recorded.
     std::vector<control::LiveStream> NeededStreams() const;
@@ -47,6 +55,7 @@ class RecordingSupervisor {
     void StartRecording(const control::LiveStream& stream);
     void AnswerFlushes();
     void ReconcileMounts(const CatalogContents& catalog);
+    std::vector<maintenance::RecordingStatus> CameraStates(const std::map<int, CameraSignal>& signals);
     bool FootageHasEnded(const store::Mark& mark) const;
     template <class Work>
     void Start(const std::string& what, Work&& start);
@@ -61,6 +70,7 @@ class RecordingSupervisor {
     std::atomic<bool> are_mounts_recovered_ = false;
     std::map<std::string, std::string> reported_failures_;
     std::map<int, Entry> entries_;
+    std::map<int, std::int64_t> lost_since_s_;                 // by camera; what an earlier recorder noticed included
     std::map<int, std::unique_ptr<MountMaintenance>> mounts_;  // by id
     StoreThread missed_marks_;
     bool stores_last_rows_ = false;

@@ -39,6 +39,16 @@ void StreamWorker::SetRecording(std::shared_ptr<FrameQueue> queue) {
     recording_ = std::move(queue);
 }
 
+StreamSignal StreamWorker::Signal() const {
+    const std::lock_guard lock(mutex_);
+    return signal_;
+}
+
+void StreamWorker::SetSignal(StreamSignal signal) {
+    const std::lock_guard lock(mutex_);
+    signal_ = std::move(signal);
+}
+
 void StreamWorker::Run(const std::stop_token& stop) {
     {
         StreamRings rings(installation_, stream_);
@@ -47,7 +57,7 @@ void StreamWorker::Run(const std::stop_token& stop) {
                 Stream(rings, stop);
             } catch (const std::exception& failure) {
                 if (!stop.stop_requested()) {
-                    ReportFailure(failure.what());
+                    ReportFailure(failure);
                     rings.EndRun();
                     WaitToTryAgain(rings, stop);
                 }
@@ -61,6 +71,7 @@ void StreamWorker::Run(const std::stop_token& stop) {
 // Leaves by an exception only.
 void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
     bool live = false;
+    std::optional<base::Codec> codec;
     const std::unique_ptr<media::Source> source = media::OpenSource(kinds_, plan_.url, options_, stop);
     for (;;) {
         const media::Packet packet = source->Next();
@@ -74,6 +85,10 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
         WriteRings(rings, packet, source->Audio());
         if (packet.medium == base::Medium::kVideo) {
             backoff_.NotePicture(base::MonotonicMicros());
+            if (codec != packet.format->codec) {
+                codec = packet.format->codec;
+                SetSignal({.codec = codec});
+            }
         }
         if (!std::exchange(live, true)) {
             ReportLive(*packet.format, source->Audio());
@@ -126,7 +141,10 @@ void StreamWorker::ReportLive(const media::StreamFormat& video, const std::optio
 }
 
 // Once for each change, not once for each attempt.
-void StreamWorker::ReportFailure(const std::string& reason) {
+void StreamWorker::ReportFailure(const std::exception& failure) {
+    const auto* const source_failure = dynamic_cast<const media::SourceError*>(&failure);
+    const std::string reason = failure.what();
+    SetSignal({{}, source_failure == nullptr ? base::SignalLoss::kOther : source_failure->Cause(), reason});
     if (reason != reported_failure_) {
         base::LogWarning(Title(stream_, plan_) + reason + "; trying again");
         reported_failure_ = reason;

@@ -14,6 +14,7 @@
 #include <thread>
 
 #include "standalone/base/installation.h"
+#include "standalone/base/signal_loss.h"
 #include "standalone/control/demand.h"
 #include "standalone/media/source.h"
 #include "standalone/recorder/backoff.h"
@@ -35,6 +36,13 @@ struct StreamPlan {
     }
 };
 
+// Whether pictures come. Neither codec nor reason: the first attempt to connect is still under way.
+struct StreamSignal {
+    std::optional<base::Codec> codec;  // of the pictures; none while they do not come
+    base::SignalLoss loss = base::SignalLoss::kOther;
+    std::string reason = {};  // why they do not come, in one sentence without credentials; empty while they do
+};
+
 class StreamWorker {
   public:
     // Starts the stream's thread, which takes no signals. Installation and kinds must outlive the worker. Throws
@@ -43,6 +51,7 @@ class StreamWorker {
                  StreamPlan plan, std::chrono::milliseconds no_data_limit);
 
     const StreamPlan& Plan() const { return plan_; }
+    StreamSignal Signal() const;
 
     // Where frames go besides the rings; null when the stream is not recorded.
     void SetRecording(std::shared_ptr<FrameQueue> queue);
@@ -58,7 +67,8 @@ class StreamWorker {
     void WriteRings(StreamRings& rings, const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
     void WaitToTryAgain(StreamRings& rings, const std::stop_token& stop);
     void ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio);
-    void ReportFailure(const std::string& reason);
+    void ReportFailure(const std::exception& failure);
+    void SetSignal(StreamSignal signal);
 
     const base::Installation& installation_;
     const media::SourceKinds& kinds_;
@@ -69,7 +79,8 @@ class StreamWorker {
     std::string reported_failure_;  // empty when the last report was another
     std::string ring_failure_;      // empty while the rings are written
     std::int64_t ring_pause_us_ = 0;
-    std::mutex mutex_;
+    mutable std::mutex mutex_;
+    StreamSignal signal_;
     std::shared_ptr<FrameQueue> recording_;
     std::atomic<bool> has_ended_ = false;
     std::jthread thread_;  // last: it uses the others

@@ -78,7 +78,8 @@ void Supervisor::DoEverySecond() {
                   : base::LogError("another process holds the common record's lock");
     }
     catalog_.Refresh();
-    recordings_.DoEverySecond();
+    recordings_.DoEverySecond(Signals());
+    CorrectVideoTypes();
     if (seconds_++ % kOrphanSearchSeconds == 0) {
         if (const std::size_t removed = ring::RemoveOrphans(installation_); removed > 0) {
             base::LogInfo("removed " + std::to_string(removed) + " segments of a dead recorder");
@@ -113,6 +114,31 @@ void Supervisor::Reconcile() {
         }
         if (const auto worker = workers_.find(stream); worker != workers_.end()) {
             worker->second->SetRecording(recordings_.QueueOf(stream));
+        }
+    }
+}
+
+std::map<int, CameraSignal> Supervisor::Signals() const {
+    std::map<int, CameraSignal> signals;
+    for (const auto& [stream, worker] : workers_) {
+        const CameraSignal signal{worker->Plan().camera_name, recordings_.QueueOf(stream) != nullptr, worker->Signal()};
+        const auto [known, is_first] = signals.try_emplace(stream.camera, signal);
+        if (!is_first && !known->second.is_recorded && (signal.is_recorded || !signal.stream.reason.empty())) {
+            known->second = signal;
+        }
+    }
+    return signals;
+}
+
+// A camera may be set up anew, or exchanged, behind the owner's back.
+void Supervisor::CorrectVideoTypes() {
+    const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
+    for (const auto& [stream, worker] : workers_) {
+        const auto plan = catalog->cameras.find(stream.camera);
+        const std::optional<base::Codec> codec = worker->Signal().codec;
+        if (codec && plan != catalog->cameras.end() && plan->second.live_stream == stream.stream &&
+            plan->second.video_type != *codec) {
+            catalog_.CorrectVideoType(stream.camera, *codec);
         }
     }
 }

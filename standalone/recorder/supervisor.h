@@ -39,6 +39,8 @@ class Supervisor {
     void DoEverySecond();
     void Reconcile();
     void DropEndedWorkers();
+    std::map<int, CameraSignal> Signals() const;
+    void CorrectVideoTypes();
     void Start(control::LiveStream stream, const StreamPlan& plan);
     std::chrono::milliseconds TimeToNextStep() const;
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/remote/certificate.h"
 
+#include <ctime>
 #include <memory>
 #include <optional>
 
@@ -85,6 +86,15 @@ std::string CertificateName(const std::string& pem) {
         throw InvalidCertificate("the certificate names no valid host");
     }
     return name;
+}
+
+std::int64_t CertificateEnd(const std::string& pem) {
+    const Certificate certificate = RequireFirst(Open(pem));
+    std::tm end{};
+    if (ASN1_TIME_to_tm(X509_get0_notAfter(certificate.get()), &end) != 1) {
+        throw InvalidCertificate("the certificate names no end of its validity");
+    }
+    return ::timegm(&end);
 }
 
 }  // namespace lookhaven::remote

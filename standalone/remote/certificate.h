@@ -3,6 +3,7 @@
 // Reads a web server's certificate.
 #pragma once
 
+#include <cstdint>
 #include <stdexcept>
 #include <string>
 
@@ -20,5 +21,8 @@ std::string CertificatesIn(const std::string& pem);
 // A host name that the certificate is valid for: its first DNS name, else its common name. Throws
 // InvalidCertificate when that is no valid host name.
 std::string CertificateName(const std::string& pem);
+
+// UTC seconds when the first certificate expires. Throws InvalidCertificate when there is none.
+std::int64_t CertificateEnd(const std::string& pem);
 
 }  // namespace lookhaven::remote

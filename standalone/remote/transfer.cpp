@@ -8,12 +8,15 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdlib>
+#include <ctime>
 #include <memory>
 
 #include <curl/curl.h>
 #include <sys/socket.h>
 
 #include "standalone/remote/certificate.h"
+#include "standalone/remote/pair_token.h"
 
 namespace lookhaven::remote {
 
@@ -98,7 +101,7 @@ class Transfer {
         }
         if (!has_begun_ && !is_refused_by_sink_) {
             if (result == CURLE_PEER_FAILED_VERIFICATION) {
-                throw NoAnswer("its certificate is not the one that it was paired with");
+                throw NoAnswer("its certificate is not the one that it was paired with, or has expired");
             }
             throw NoAnswer(!refusal_.empty()     ? refusal_
                            : problem_[0] != '\0' ? problem_.data()
@@ -120,7 +123,7 @@ class Transfer {
         long status = 0;
         ::curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
         if (status == 401 || status == 403) {
-            throw NoAnswer("it does not let this host in");
+            throw NoAnswer(WhyNotAdmitted());
         }
         if (status != 200) {
             throw NoAnswer("it answers with status " + std::to_string(status));
@@ -128,6 +131,20 @@ class Transfer {
         if (!IsOneOf(expected_.content_types, ContentType())) {
             throw NoAnswer("its answer is not what was asked for");
         }
+    }
+
+    // What proves this host's identity is valid for a few minutes only.
+    std::string WhyNotAdmitted() const {
+        curl_header* date = nullptr;
+        if (::curl_easy_header(handle_.get(), "Date", 0, CURLH_HEADER, -1, &date) == CURLHE_OK) {
+            const std::time_t its_now_s = ::curl_getdate(date->value, nullptr);
+            const std::int64_t ahead_s = its_now_s - std::time(nullptr);
+            if (its_now_s >= 0 && std::abs(ahead_s) > kPairTokenWindowSeconds) {
+                return "its clock is " + std::to_string(std::abs(ahead_s) / 60) + " minutes " +
+                       (ahead_s < 0 ? "behind" : "ahead of") + " this host's: set both right";
+            }
+        }
+        return "it does not let this host in: it knows another secret, or has ended the pairing; pair the two anew";
     }
 
     std::string_view ContentType() const {

@@ -137,6 +137,15 @@ void Cameras::Update(const Camera& camera) {
     });
 }
 
+void Cameras::SetVideoType(int id, base::Codec type) {
+    if (const std::optional<Camera> camera = Find(id); camera && camera->video_type != type) {
+        connection_.Write([&](soci::session& sql) {
+            RaiseRevision(sql);
+            Execute(sql, "update cameras set video_type = :type where id = :id", static_cast<int>(type), id);
+        });
+    }
+}
+
 void Cameras::Remove(int id) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);

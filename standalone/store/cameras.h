@@ -60,6 +60,8 @@ class Cameras {
     int Add(const Camera& camera);
     // Replaces the record of camera.id. Throws InvalidRecord or NotFound.
     void Update(const Camera& camera);
+    // What the camera was found to send. Nothing happens for an unknown camera, or when it is stored so.
+    void SetVideoType(int id, base::Codec type);
     // Removes record and credentials; recordings and denials stay. Throws NotFound.
     void Remove(int id);
 

@@ -90,7 +90,13 @@ bool Connection::HasTable(const std::string& name) {
 
 // SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the
 // time-out, when somebody wrote in between.
-Connection::Transaction::Transaction(Connection& connection, Durability durability) : session_(connection.session_) {
+Connection::Transaction::Transaction(Connection& connection, Durability durability)
+    : session_(connection.session_),
+      open_transactions_(connection.open_transactions_),
+      is_part_(open_transactions_ > 0) {
+    if (is_part_) {
+        return;
+    }
     const bool lazy = durability == Durability::kLazy;
     if (lazy && connection.IsSqlite()) {
         session_ << "pragma synchronous = normal";  // takes no effect inside a transaction
@@ -100,14 +106,21 @@ Connection::Transaction::Transaction(Connection& connection, Durability durabili
     if (lazy && !connection.IsSqlite()) {
         session_ << "set local synchronous_commit = off";
     }
+    ++open_transactions_;
 }
 
 void Connection::Transaction::Commit() {
-    session_ << "commit";
+    if (!is_part_) {
+        session_ << "commit";
+    }
     open_ = false;
 }
 
 Connection::Transaction::~Transaction() {
+    if (is_part_) {
+        return;
+    }
+    --open_transactions_;
     try {
         if (open_) {
             session_ << "rollback";

@@ -51,7 +51,8 @@ class Connection {
         }
     }
 
-    // Calls change(session) inside a transaction, which is rolled back when change throws.
+    // Calls change(session) inside a transaction, which is rolled back when change throws. Inside another Write it is a part
+    // of that one, and what it throws must end that one.
     template <typename Change>
     auto Write(Change&& change, Durability durability = Durability::kSafe) {
         return Read([&](soci::session& sql) {
@@ -93,12 +94,15 @@ class Connection {
 
       private:
         soci::session& session_;
+        int& open_transactions_;
+        const bool is_part_;
         bool restore_sync_ = false;
         bool open_ = true;
     };
 
     Engine engine_;
     soci::session session_;
+    int open_transactions_ = 0;
 };
 
 // The next id of "user", "camera", "event" or another counter of schema.cpp. Inside Write only; concurrent callers wait

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/servers.h"
 
+#include "standalone/base/host_name.h"
 #include "standalone/base/text.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/text.h"
@@ -41,18 +42,9 @@ struct Mapping<ServerDenial> {
 namespace {
 
 constexpr std::size_t kMaxCameraNameBytes = 255;
-constexpr std::size_t kMaxAddressBytes = 253;
 constexpr std::size_t kMaxCertificateBytes = 16'384;
 constexpr std::size_t kSecretDigits = 64;
 constexpr int kMaxCameras = 1000;  // of a server: what it says of itself must not fill the store
-
-// Letters, digits, ".", "-" and, of IPv6, ":": the address becomes a part of a URL, where others divide.
-bool IsAddress(std::string_view address) {
-    return !address.empty() && address.size() <= kMaxAddressBytes &&
-           address.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789.-:") ==
-               std::string_view::npos &&
-           address.front() != '-';
-}
 
 // Looks at the first and the last line; what stands between them is for the TLS library to judge.
 bool IsCertificate(std::string_view text) {
@@ -62,7 +54,7 @@ bool IsCertificate(std::string_view text) {
 
 void RequireValid(soci::session& sql, const RecordingServer& server) {
     if (server.address.empty() ? server.port != 0
-                               : !IsAddress(server.address) || server.port < 1 || server.port > 65'535) {
+                               : !base::IsHost(server.address) || server.port < 1 || server.port > 65'535) {
         throw InvalidRecord("a server is reached by a host name or address, and a port from 1 to 65535");
     }
     if (server.address.empty() != server.certificate.empty() ||

@@ -126,7 +126,8 @@ std::vector<std::string> Store::Check() {
          connection_->FetchAll<int>("select id from cameras where not exists (select 1 from camera_profiles"
                                     " where camera_id = cameras.id and number = live_profile) order by id")) {
         findings.push_back("camera " + std::to_string(camera) +
-                           " has no source for its live view: set one with lookhaven camera set");
+                           " has no source for its live view: lookhaven camera set " + std::to_string(camera) +
+                           " --live high --source ADDRESS");
     }
     return findings;
 }

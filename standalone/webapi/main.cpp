@@ -17,6 +17,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/base/state_folder.h"
 #include "standalone/host/listener.h"
 #include "standalone/host/server.h"
 
@@ -47,7 +48,7 @@ void AddMillis(CLI::App& app, const char* name, std::chrono::milliseconds& value
 }
 
 void Describe(CLI::App& app, Options& options) {
-    app.add_option("--home", options.home, "state folder (LOOKHAVEN_HOME, else var)");
+    app.add_option("--home", options.home, "state folder (default: " + base::DefaultHome().string() + ")");
     app.add_option("--socket", options.socket, "unix socket to listen on (run/webapi.sock in the state folder)");
     app.add_option("--module", options.modules, "web API module to serve; may be given several times");
     app.add_option("--max-requests", options.limits.requests, "requests running at once")->check(CLI::Range(1, 4096));

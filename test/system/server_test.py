@@ -1,18 +1,20 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # script/server: what it says when it cannot start, what it leaves behind, what it sets up.
+import contextlib
 import os
 import pathlib
 import pwd
 import signal
 import socket
+import sqlite3
 import ssl
 import subprocess
 import tempfile
 import time
 import unittest
 
-from installation import ROOT, Installation, free_port, make_certificate, wait_until
+from installation import BUILD, ROOT, Installation, free_port, make_certificate, wait_until
 
 
 def said_by(*command, **options):
@@ -55,6 +57,11 @@ class ServerTest(unittest.TestCase):
                 ("folder too long for a socket", {"LOOKHAVEN_HOME": f"{folder}/{'a' * 90}"}, ["too long"]),
                 ("folder with a quote", {"LOOKHAVEN_HOME": f'{folder}/a"b'}, ['a"b', "LOOKHAVEN_HOME"]),
             ]
+            newer = f"{folder}/newer"
+            said_by(BUILD / "bin/lookhaven", "--home", newer, "init")
+            with contextlib.closing(sqlite3.connect(f"{newer}/lookhaven.db", isolation_level=None)) as store:
+                store.execute("update schema_version set version = 999")
+            rows.append(("newer store", {"LOOKHAVEN_HOME": newer}, ["schema 999", "update Lookhaven"]))
             if os.geteuid() == 0:
                 rows.append(("folder of something else", {"LOOKHAVEN_HOME": folder}, [folder, "LOOKHAVEN_HOME"]))
             for name, environment, words in rows:
@@ -137,6 +144,8 @@ class ServerTest(unittest.TestCase):
             self.assertIn(f"127.0.0.1:{server.port}", local)
             self.assertNotIn(f"0.0.0.0:{server.port}", local)
             self.assertIn(f"0.0.0.0:{server.tls_port}", local)
+            if pathlib.Path("/proc/net/if_inet6").read_text():
+                self.assertIn(f"[::]:{server.tls_port}", local)
             context = ssl.create_default_context(cafile=server.home / "tls/certificate.pem")
             context.set_alpn_protocols(["h2"])
             with socket.create_connection(("127.0.0.1", server.tls_port)) as plain:

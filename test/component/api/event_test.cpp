@@ -7,6 +7,8 @@
 #include <gtest/gtest.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/recording_status.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
@@ -168,6 +170,29 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
     EXPECT_EQ(Ask(download).status, 404) << "an empty file";
     std::filesystem::remove(footage_.FileOf(event));
     EXPECT_EQ(Ask(download).status, 404) << "a file that is gone";
+}
+
+TEST_F(EventApi, TellsWhichCamerasAreDownToThoseWhoMayWatchThem) {
+    const std::string ask = "Catalog&version=1&method=CameraStates";
+    maintenance::RecordingStatus down{.camera = 1, .state = maintenance::RecordingState::kNoSignal};
+    down.lost_since_s = 1'772'352'930;
+    down.loss = base::SignalLoss::kRefused;
+    down.loss_reason = "cannot open rtsp://192.0.2.1/";
+    maintenance::RecordingStatus denied = down;
+    denied.camera = 2;
+    maintenance::WriteRecordingStatus(host_.Home(), {down, denied, {.camera = 3}});
+    EXPECT_EQ(Ask(ask).Json()["data"]["recorder"], false) << "stale";
+    EXPECT_TRUE(Ask(ask).Json()["data"]["camera"].empty());
+    control::CommonConfigKeeper(host_.Home()).Refresh(false);
+    const Json::Value all = Ask(ask).Json()["data"]["camera"];
+    ASSERT_EQ(all.size(), 3U);
+    EXPECT_EQ(all[0]["state"], "no-signal");
+    EXPECT_EQ(all[1]["no_signal"]["reason"], "cannot open rtsp://192.0.2.1/");
+    EXPECT_FALSE(all[2].isMember("no_signal"));
+    const Json::Value seen = Ask(ask, "", true).Json()["data"]["camera"];
+    ASSERT_EQ(seen.size(), 2U);
+    EXPECT_EQ(seen[0]["no_signal"]["cause"], "refused");
+    EXPECT_FALSE(seen[0]["no_signal"].isMember("reason")) << "an address of the cameras' network";
 }
 
 TEST_F(EventApi, ListsGroupsAndMountsThatTheCallerMaySee) {

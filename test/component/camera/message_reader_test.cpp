@@ -98,6 +98,8 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
          refused + "a message above its limit"},
         {"huge format", opened + Message(kFormat, "", Medium::kVideo, 0, ~std::uint32_t{0}),
          refused + "a message above its limit"},
+        {"reason of an unknown kind", opened + Bytes(MessageHead{5, 0, 7, 0, 1, 0}) + "x",
+         refused + "an unknown cause"},
         {"huge reason", opened + Message(kFailure, std::string(1025, 'x')), refused + "a message above its limit"},
         {"body of an empty message", Message(kConfined, "x"), refused + "a message above its limit"},
         {"frame before its format", opened + Message(kFrame, "one"), refused + "a frame without its format"},

@@ -24,8 +24,8 @@ TEST_F(CliTest, WithoutAnInstallationEveryCommandSaysHowToMakeOneAndWrongUsePoin
     }
     Play({{"--json camera list", 66, "\"code\" : 66"}});
     std::filesystem::create_directory(home_);
-    Play({{"camera list", 69, "run lookhaven init"},
-          {"log show", 66, "run lookhaven init"},
+    Play({{"camera list", 66, "is no state folder"},
+          {"init --home " + folder_.Path().string(), 73, "not empty and is no state folder"},
           {"init --home /proc/none", 73, "--home"},
           {"version", 0, "lookhaven "},
           {"version --json", 0, "\"version\""},
@@ -119,6 +119,14 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
           {"camera add --name x --source 'concat:a|b' --type mjpeg", 65, "begins with file:"},
           {"camera add --name x --source http:///path --type mjpeg", 65, "begins with file:"},
           {"camera add --name x --source file: --type mjpeg", 65, "begins with file:"},
+          {"camera add --name x --source rtsp://192.0.2.256/a --type h264", 65, "no valid host"},
+          {"camera add --name x --source http://cam:99999/a", 65, "no valid host or port"},
+          {"camera add --name Half --source test:mjpeg --segment 5s --account root", 65, "10 to 3600", "",
+           "camera-s3cret\n"},
+          {"camera list", 0, "Haustür", "Half"},
+          {"camera set 6 --type mjpeg", 0, "Changed"},
+          {"camera set 6 --source 'test:h264?size=160x120&fps=10' --json", 0, "\"video_type\" : 3"},
+          {"camera list", 0, "unknown"},
           {"camera add --name '' --source test:mjpeg --type mjpeg", 65, "name is 1 to 255 bytes"},
           {"camera add --name x --source test:mjpeg --type mjpeg --size 12y", 64, "looks like 1280x720"},
           {"camera add --name x --source test:mjpeg --type mpeg4", 64, "--type"},

@@ -84,6 +84,11 @@ TEST_F(EmapsTest, AHostIsNotRemovedWithItsDenialsUnseen) {
     servers.Pair(annex, std::string(64, 'a'), {{.id_on_server = 1, .name = "Yard"}});
     const std::string camera = std::to_string(servers.FindCamera(1, 1)->id);
     Play({{"server refresh", 69, "Annex failed: there is no certificate"},
+          {"server set 1 --port 2 --address cam..example", 65, "host name or address"},
+          {"server set 1 --name Shed --port 2 --json", 0, "\"answers\" : false"},
+          {"server list", 0, "127.0.0.1  2"},
+          {"server set 1 --name Annex --disable", 0, "Changed", "answer"},
+          {"server pair x --address http://nvr/", 65, "neither a host name"},
           {"io add Shed --server 1 --id-on-server 4", 0, "id 2"},
           {"user deny viewer " + camera, 0, "denied"},
           {"user deny viewer --io 2", 0, "denied"},

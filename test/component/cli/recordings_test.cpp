@@ -178,7 +178,13 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
           {"camera set 1 --mount 0", 0, "Changed"}});
     store::Events events(store);
     AddRow(events, 1, kStart, base::kReasonContinuous, false);
-    Play({{"mount remove 1", 65, "--forget"},
+    Play({{"mount set 1 --limit 500", 64, "a size looks like"},
+          {"mount set 1 --max-age 30", 64, "a duration looks like"},
+          {"mount set 1 --max-age 30d --name Old", 65, "deletes the 1 oldest recordings"},
+          {"mount list", 0, "none", "Old"},
+          {"mount set 1 --max-age 30d --yes", 0, "Changed"},
+          {"mount set 1 --max-age 31d", 0, "Changed"},
+          {"mount remove 1", 65, "--forget"},
           {"mount remove 1 --forget", 0, "files stay"},
           {"event list", 0, "no such event"}});
     EXPECT_TRUE(std::filesystem::exists(home_ / "recordings"));

@@ -10,6 +10,8 @@
 #include "standalone/base/file.h"
 #include "standalone/base/process.h"
 #include "standalone/control/common_config.h"
+#include "standalone/maintenance/recording_status.h"
+#include "standalone/store/cameras.h"
 #include "test/component/recorder/recorder_fixture.h"
 #include "test/support/camera/mjpeg_camera.h"
 
@@ -86,22 +88,47 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     page.SetMood(MjpegCamera::Mood::kPage);
     Viewer good(*installation_, AddCamera(kSmallPattern));
     control::Demand demand(*installation_);
-    const std::vector<std::pair<std::string, std::string>> bad{
+    MjpegCamera guarded("viewer:secret");
+    MjpegCamera stalled;
+    stalled.SetMood(MjpegCamera::Mood::kStall);
+    using enum base::SignalLoss;
+    const struct {
+        std::string source;
+        const char* message;
+        base::SignalLoss loss = kOther;
+        int camera = 0;
+    } rows[] = {
         {"test:nonsense", "no test pattern"},
         {"test:mjpeg?size=1x1", "has a size"},
         {"file:" + (home_ / "missing.mkv").string(), "no regular file"},
         {"file:/dev/zero", "no regular file"},
         {"file:" + (home_ / "log/recorder").string(), "cannot open"},
-        {"http://127.0.0.1:1/", "Connection refused"},
-        {"rtsp://127.0.0.1:1/", "Connection refused"},
+        {"http://127.0.0.1:1/", "Connection refused", kRefused},
+        {"rtsp://127.0.0.1:1/", "Connection refused", kRefused},
+        {"http://unknown.invalid/", "the host name cannot be resolved", kUnknownHost},
+        {guarded.Url(), "401", kWrongPassword},
+        {stalled.Url(), "no picture for 1000 ms", kStalled},
         {page.Url(), "does not answer with Motion JPEG"},
     };
-    for (const auto& [source, message] : bad) {
-        demand.Request({AddCamera(source), 0});
+    std::vector bad(std::begin(rows), std::end(rows));
+    for (auto& row : bad) {
+        row.camera = AddCamera(row.source);
+        demand.Request({row.camera, 0});
     }
-    const Child recorder = StartRecorder();
-    for (const auto& [source, message] : bad) {
-        EXPECT_TRUE(Eventually([&] { return good.HasPicture() && LogLines(message) > 0; })) << source << message;
+    Child recorder = StartRecorder();
+    const auto status_of = [&](int camera) {
+        const auto all = maintenance::ReadRecordingStatus(*installation_);
+        const auto found = std::ranges::find(all, camera, &maintenance::RecordingStatus::camera);
+        return found == all.end() ? maintenance::RecordingStatus() : *found;
+    };
+    for (const auto& row : bad) {
+        SCOPED_TRACE(row.source);
+        EXPECT_TRUE(Eventually([&] { return good.HasPicture() && LogLines(row.message) > 0; })) << row.message;
+        EXPECT_TRUE(Eventually([&] {
+            const maintenance::RecordingStatus status = status_of(row.camera);
+            return status.state == maintenance::RecordingState::kNoSignal && status.loss == row.loss &&
+                   status.lost_since_s > 0 && status.loss_reason.find(row.message) != std::string::npos;
+        })) << "the owner is not told";
     }
     std::int64_t last_us = good.Next().timestamp_us;
     for (const Seen& seen : good.Take(50)) {
@@ -110,6 +137,18 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     }
     EXPECT_EQ(Segments(), 1u);
     EXPECT_EQ(LogLines("does not answer with Motion JPEG"), 1u) << "a line for each attempt";
+    EXPECT_EQ(status_of(bad.front().camera - 1).state, maintenance::RecordingState::kReady) << "the good one";
+    const int refused = bad[5].camera;
+    const std::int64_t since_s = status_of(refused).lost_since_s;
+    recorder.Signal(SIGTERM);
+    EXPECT_EQ(recorder.Wait(), 0);
+    const Child next = StartRecorder();
+    for (const auto& row : bad) {
+        demand.Request({row.camera, 0});
+    }
+    ASSERT_TRUE(Eventually([&] { return LogLines("Connection refused") > 2; }));
+    EXPECT_TRUE(Eventually([&] { return status_of(refused).lost_since_s == since_s; }))
+        << "down since its recorder began";
 }
 
 TEST_F(RecorderTest, ProcessOfACameraIsConfinedAndItsDeathIsThatCamerasTrouble) {
@@ -258,6 +297,9 @@ TEST_F(RecorderTest, PatternDecodesWithSound) {
     ExpectDecodesFromEveryKeyFrame(pictures, 4);
     EXPECT_STREQ(ring::Codec(listener.Ring()), "AAC");
     EXPECT_EQ(Decoded("aac", ring::ExtraData(listener.Ring()), blocks), blocks.size());
+    store::Store store = store::Store::Open(installation_->StoreUrl());
+    EXPECT_TRUE(Eventually([&] { return store::Cameras(store).Find(camera)->video_type == base::Codec::kH264; }))
+        << "listed as what it was set up as";
     // One clock for both media, and it is the machine's.
     const std::int64_t first_us = pictures.front().timestamp_us;
     for (const Seen& block : blocks) {

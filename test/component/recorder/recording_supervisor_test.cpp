@@ -74,7 +74,7 @@ TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
     catalog.mounts = {{failing, true}, {foreign, true}, {copied, true}, {good, true}, {unplugged.id, true}};
     const auto states = [&] {
         supervisor.Reconcile(catalog);
-        supervisor.DoEverySecond();
+        supervisor.DoEverySecond({});
         std::string text;
         for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation_)) {
             text += std::string(NameOf(status.state)) + " ";

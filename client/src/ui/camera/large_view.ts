@@ -54,6 +54,7 @@ export class LargeView {
     );
     this.#picture = new LivePicture(
       () => this.#source.unplayable,
+      () => server.outages.of(camera),
       () => this.#showState(),
       true,
     );

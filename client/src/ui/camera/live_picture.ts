@@ -5,6 +5,7 @@
 import { Feed } from "../../live/feed";
 import type { SignalState } from "../../live/signal_state";
 import type { Unplayable } from "../../live/unplayable";
+import type { Outage } from "../../wire/outages";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { signalText } from "../widgets/text";
@@ -21,22 +22,31 @@ export class LivePicture {
   readonly feed: Feed;
   readonly root: HTMLElement;
   readonly #unplayable: () => Unplayable | null;
+  readonly #outage: () => Outage | null;
   readonly #changed: () => void;
   readonly #canLink: boolean;
   readonly #sentence = element("p", { class: "message-sentence" });
   readonly #reason = element("p", { class: "message-reason" });
   readonly #hint = element("p", { class: "hint", role: "note" });
   #hintFor: Unplayable | null = null;
+  /** State and reason that are on the screen. */
+  #shown = "";
   #frames = 0;
   #rateSinceMs = performance.now();
   #framesPerSecond = 0;
 
   /**
-   * `unplayable` says why still pictures are shown; `changed` is called after the state on the screen changed: call
+   * `unplayable` says why still pictures are shown, `outage` why the camera sends none; `changed` is called after the state on the screen changed: call
    * `refresh` once when you are ready for it. Links are shown where `canLink`, which is not so within a button.
    */
-  constructor(unplayable: () => Unplayable | null, changed: () => void, canLink: boolean) {
+  constructor(
+    unplayable: () => Unplayable | null,
+    outage: () => Outage | null,
+    changed: () => void,
+    canLink: boolean,
+  ) {
     this.#unplayable = unplayable;
+    this.#outage = outage;
     this.#canLink = canLink;
     this.#changed = changed;
     this.feed = new Feed(
@@ -62,6 +72,8 @@ export class LivePicture {
     const state = this.feed.state();
     const unplayable = this.#unplayable();
     const isShown = state.kind === "live" || state.kind === "idle";
+    const outage = isShown ? null : this.#outage();
+    if (outage) return { kind: "lost", sinceMs: outage.sinceMs, reason: `Camera: ${outage.cause}.` };
     if (!unplayable || isShown || this.feed.failure?.status !== kNoSuchApi) return state;
     return { kind: "unavailable", reason: unplayable.reason };
   }
@@ -98,7 +110,9 @@ export class LivePicture {
     const noStills = "The server has no still pictures of this camera.";
     setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
     this.#showHint(state.kind === "unavailable" ? null : this.#unplayable());
-    if (this.root.dataset["state"] !== state.kind) {
+    const shown = state.kind === "lost" ? `${state.kind} ${state.reason}` : state.kind;
+    if (shown !== this.#shown) {
+      this.#shown = shown;
       this.root.dataset["state"] = state.kind;
       this.#changed();
     }

@@ -16,6 +16,7 @@ import { Screen, type Session } from "./screen";
 const kRefreshMs = 500;
 /** Cameras come and go seldom. */
 const kListIntervalMs = 30_000;
+const kOutagesIntervalMs = 5_000;
 
 export class WallScreen extends Screen {
   readonly #grid: Grid;
@@ -41,6 +42,7 @@ export class WallScreen extends Screen {
     document.addEventListener("visibilitychange", loadUnlessHidden, { signal: this.closed });
     this.every(kListIntervalMs, loadUnlessHidden);
     this.every(kRefreshMs, () => this.#refresh());
+    this.every(kOutagesIntervalMs, () => void (document.hidden || this.server.outages.refresh()));
     this.#refresh();
     void this.#load();
   }
@@ -69,7 +71,10 @@ export class WallScreen extends Screen {
   }
 
   async #load(): Promise<void> {
-    const list = await this.server.cameras().catch((error: ServerError) => error);
+    const [list] = await Promise.all([
+      this.server.cameras().catch((error: ServerError) => error),
+      this.server.outages.refresh(),
+    ]);
     if (this.closed.aborted) return;
     this.#error = list instanceof ServerError ? list.message : "";
     this.progress.hidden = true;

@@ -24,6 +24,7 @@ export class Tile {
   readonly root: HTMLElement;
   readonly camera: Camera;
   readonly picture: LivePicture;
+  readonly #server: Server;
   readonly #open: HTMLButtonElement;
   readonly #state = element("span", { class: "tile-state" });
   readonly #stills: SnapshotSource;
@@ -31,6 +32,7 @@ export class Tile {
 
   constructor(camera: Camera, server: Server, semaphore: Semaphore, actions: TileActions) {
     this.camera = camera;
+    this.#server = server;
     this.#stills = new SnapshotSource(server, camera, semaphore);
     this.#streams = {
       "stream-small": new StreamSource(server, camera, true, this.#stills),
@@ -39,6 +41,7 @@ export class Tile {
     this.#open = element("button", { type: "button", class: "tile-open" });
     this.picture = new LivePicture(
       () => this.unplayable,
+      () => server.outages.of(camera),
       () => this.#showState(),
       false,
     );
@@ -89,7 +92,7 @@ export class Tile {
       case "unavailable":
         return "not available";
       case "lost":
-        return "no signal";
+        return this.#server.outages.of(this.camera)?.cause ?? "no signal";
       case "live":
       case "connecting":
         return signalText(state, this.picture.feed.source?.pollIntervalMs);

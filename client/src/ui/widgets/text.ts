@@ -54,6 +54,12 @@ export function snapshotFileName(cameraName: string, takenMs: number): string {
   return `${name}_${calendarDate(takenMs)}_${clockTime(takenMs).replaceAll(":", "-")}.jpg`;
 }
 
+/** "08:15:30"; with the date where that is another day. */
+function sinceText(unixMs: number, nowMs: number): string {
+  const isToday = calendarDate(unixMs) === calendarDate(nowMs);
+  return isToday ? clockTime(unixMs) : `${calendarDate(unixMs)} ${clockTime(unixMs)}`;
+}
+
 /** `pollIntervalMs` is the time between two pictures of a source that polls. */
 export function signalText(state: SignalState, pollIntervalMs = 0): string {
   switch (state.kind) {
@@ -64,6 +70,6 @@ export function signalText(state: SignalState, pollIntervalMs = 0): string {
     case "live":
       return pollIntervalMs > 0 ? `live, every ${pollIntervalMs / 1000} s` : "live";
     case "lost":
-      return `no signal since ${clockTime(state.sinceMs)}`;
+      return `no signal since ${sinceText(state.sinceMs, Date.now())}`;
   }
 }

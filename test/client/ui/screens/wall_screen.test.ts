@@ -70,6 +70,11 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     server.stalled.add(3);
     await page.locator("[data-camera='3'] .message-sentence", { hasText: /^No signal since \d\d:\d\d:\d\d$/ }).waitFor();
     expect(await page.textContent(".bar-status")).toBe("3 cameras · 1 without signal");
+    const lost = { id: 3, state: "no-signal", no_signal: { since: 0, cause: "wrong-password" } };
+    server.answers = { CameraStates: { recorder: true, camera: [lost] } };
+    await page.locator("[data-camera='3'] .tile-state", { hasText: "wrong password" }).waitFor();
+    expect(await page.textContent("[data-camera='3'] .message")).toMatch(/since 1970-01-01 .*Camera: wrong password/);
+    server.answers = {};
     expect(await page.getAttribute("[data-camera='1']", "data-state")).toBe("live");
     server.stalled.clear();
     await allLive(page, 3);

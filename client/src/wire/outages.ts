@@ -1,0 +1,53 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which cameras send no picture, since when and why, as the recorder knows it.
+
+import type { Camera, Server } from "./server";
+
+export interface Outage {
+  /** Unix milliseconds; when it was first noticed. */
+  sinceMs: number;
+  /** In few words, for the user. */
+  cause: string;
+}
+
+/** Answer of CameraStates. */
+interface CameraStates {
+  camera: { id: number; state: string; no_signal?: { since: number; cause: string } }[];
+}
+
+const kCauses: Record<string, string> = {
+  refused: "connection refused",
+  unreachable: "unreachable",
+  "unknown-host": "unknown host",
+  "wrong-password": "wrong password",
+  certificate: "untrusted certificate",
+  stalled: "no answer in time",
+};
+
+export class Outages {
+  readonly #server: Server;
+  readonly #known = new Map<number, Outage>();
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  /** Asks the server. A failure changes nothing: the pictures themselves show that something is wrong. */
+  async refresh(): Promise<void> {
+    try {
+      const { camera } = await this.#server.call<CameraStates>("VEXO.Catalog", "CameraStates", {}, { quiet: true });
+      this.#known.clear();
+      for (const { id, no_signal: lost } of camera) {
+        if (lost) this.#known.set(id, { sinceMs: lost.since * 1000, cause: kCauses[lost.cause] ?? "failure" });
+      }
+    } catch {
+      // As before.
+    }
+  }
+
+  /** Null for a camera that is well, that nobody asks for, or that another host has. */
+  of({ id, server }: Camera): Outage | null {
+    return server ? null : (this.#known.get(id) ?? null);
+  }
+}

@@ -1,0 +1,113 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Cameras: whether they send pictures, whether these are recorded, and the shared memory that they pass through.
+#include <algorithm>
+
+#include "standalone/cli/console.h"
+#include "standalone/cli/doctor/checks.h"
+#include "standalone/cli/units.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/recording_status.h"
+#include "standalone/ring/inventory.h"
+#include "standalone/store/cameras.h"
+
+namespace lookhaven::cli::doctor {
+
+namespace {
+
+using base::SignalLoss;
+using maintenance::RecordingState;
+using maintenance::RecordingStatus;
+
+std::string TitleOf(const RecordingStatus& status) {
+    return Concat("camera ", status.camera, " (", status.camera_name, ")");
+}
+
+std::string RemedyOf(const RecordingStatus& status) {
+    switch (status.loss) {
+    case SignalLoss::kWrongPassword:
+        return Concat("lookhaven camera set ", status.camera, " --account ACCOUNT");
+    case SignalLoss::kCertificate:
+        return Concat("have an authority that this machine trusts sign it, or: lookhaven camera set ", status.camera,
+                      " --insecure");
+    case SignalLoss::kRefused:
+    case SignalLoss::kUnknownHost:
+    case SignalLoss::kUnreachable:
+        return Concat("switch the camera on, or, where its address or port is another: lookhaven camera set ",
+                      status.camera, " --source ADDRESS");
+    default:
+        return Concat("restart the camera, and see what it sends: lookhaven camera probe ", status.camera);
+    }
+}
+
+Finding NoSignal(const RecordingStatus& status) {
+    return {Concat(TitleOf(status), " sends no picture since ", FormatMoment(status.lost_since_s), ": ",
+                   base::NameOf(status.loss), " (", status.loss_reason, ")"),
+            RemedyOf(status)};
+}
+
+bool IsPaused(RecordingState state) {
+    return state != RecordingState::kReady && state != RecordingState::kRecording && state != RecordingState::kNoSignal;
+}
+
+}  // namespace
+
+// A camera with an address of HTTPS whose certificate may be anybody's.
+Findings CheckCameras(const base::Installation& installation) {
+    Findings findings;
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        for (const store::Camera& camera : store::Cameras(store).List()) {
+            if (camera.insecure && std::ranges::any_of(camera.profiles, [](const store::CameraProfile& profile) {
+                    return profile.source.starts_with("https:");
+                })) {
+                findings.push_back(
+                    {Concat("the HTTPS certificate of camera ", camera.id, " is not verified"),
+                     Concat("once an authority that this machine trusts has signed it: lookhaven camera set ",
+                            camera.id, " --secure"),
+                     Severity::kNote});
+            }
+        }
+    } catch (const std::exception&) {
+        return {};  // CheckStore reports it
+    }
+    return findings;
+}
+
+// What the recorder reports of each camera.
+Findings CheckRecordings(const base::Installation& installation) {
+    if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
+        return {};  // stale
+    }
+    Findings findings;
+    for (const RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+        if (status.lost_since_s > 0) {
+            findings.push_back(NoSignal(status));
+        }
+        if (IsPaused(status.state)) {
+            const bool lacks_event_id = status.state == RecordingState::kNoEventId;
+            findings.push_back({Concat(TitleOf(status), " is not recorded: ", maintenance::NameOf(status.state)),
+                                lacks_event_id
+                                    ? "mend the store, which gives out event ids; recording then resumes by itself"
+                                    : "check that its mount is enabled and in its place with lookhaven mount "
+                                      "list; recording then resumes by itself"});
+        }
+    }
+    return findings;
+}
+
+Findings CheckSegments(const base::Installation& installation) {
+    Findings findings;
+    for (const ring::SegmentState& segment : ring::ListSegments(installation)) {
+        const std::string name = Concat("the shared memory ", segment.shm_id, " of camera ", segment.id.camera);
+        if (!segment.has_known_layout) {
+            findings.push_back({name + " was created by another version",
+                                Concat("restart the server; if it stays: ipcrm -m ", segment.shm_id)});
+        } else if (!segment.writer_alive && segment.attached == 0) {
+            findings.push_back({name + " was left behind", "start the recorder, which reuses or removes it"});
+        }
+    }
+    return findings;
+}
+
+}  // namespace lookhaven::cli::doctor

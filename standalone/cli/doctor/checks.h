@@ -1,0 +1,68 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What lookhaven doctor looks at: a function for each part of an installation, in the file of its kind.
+//
+// Invariants    (1) A check judges as the user who runs it, who must be the one that runs the server.
+//               (2) It changes nothing and throws nothing. Where another check tells the cause, it finds nothing.
+//               (3) A remedy that begins with a command's name is that command line, ready to be run; "as root: " may stand
+//               before it, and words in capitals are for the owner to fill in. Any other is for hands.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "standalone/base/installation.h"
+
+namespace lookhaven::cli::doctor {
+
+enum class Severity {
+    kFault,
+    kNote,  // somebody may want it so
+};
+
+// "fault", "note"
+const char* NameOf(Severity severity);
+
+struct Finding {
+    std::string problem;
+    std::string remedy;
+    Severity severity = Severity::kFault;
+};
+using Findings = std::vector<Finding>;
+
+// folder_checks.cpp
+Findings CheckFolder(const base::Installation& installation);
+
+// store_checks.cpp
+Findings CheckStore(const base::Installation& installation);
+
+// mount_checks.cpp
+Findings CheckMounts(const base::Installation& installation);
+Findings CheckMaintenance(const base::Installation& installation);
+
+// camera_checks.cpp
+Findings CheckCameras(const base::Installation& installation);
+Findings CheckRecordings(const base::Installation& installation);
+Findings CheckSegments(const base::Installation& installation);
+
+// process_checks.cpp
+Findings CheckHost(const base::Installation& installation);
+Findings CheckRecorder(const base::Installation& installation);
+Findings CheckActiveRecorder(const base::Installation& installation);
+
+// web_checks.cpp
+Findings CheckWebServer(const base::Installation& installation);
+Findings CheckCertificate(const base::Installation& installation);
+Findings CheckPairedHosts(const base::Installation& installation);
+
+// The name of the user who runs this program, for a remedy.
+std::string OwnName();
+
+// The path as a shell takes it.
+std::string Quoted(const std::string& path);
+
+// What keeps this user from writing to a folder of that title: another owner, missing rights, a file system that is
+// read-only. Empty when nothing does.
+Findings CheckAccess(const std::string& title, const std::string& path);
+
+}  // namespace lookhaven::cli::doctor

@@ -1,0 +1,62 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The record store: whether it can be read, belongs to this program, and makes sense.
+#include <algorithm>
+#include <cerrno>
+#include <filesystem>
+
+#include <unistd.h>
+
+#include "standalone/cli/doctor/checks.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::cli::doctor {
+
+namespace {
+
+constexpr const char* kRestore = "end the server, put a backup in the place of the store, start the server and run "
+                                 "lookhaven verify --repair, which takes"
+                                 " back what was recorded since";
+
+// What SQLite says of a file that it cannot understand.
+bool IsMalformed(const std::string& message) {
+    return message.find("malformed") != std::string::npos || message.find("not a database") != std::string::npos;
+}
+
+Finding FindingOf(const std::string& sentence) {
+    const std::size_t colon = sentence.find(": ");
+    return {sentence.substr(0, colon), colon == std::string::npos ? kRestore : sentence.substr(colon + 2)};
+}
+
+}  // namespace
+
+Findings CheckStore(const base::Installation& installation) {
+    const std::filesystem::path file = installation.Home() / "lookhaven.db";
+    if (::access(file.c_str(), R_OK | W_OK) != 0 && errno != ENOENT) {
+        return {};  // CheckFolder reports it
+    }
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        Findings findings;
+        for (const std::string& sentence : store.Check()) {
+            findings.push_back(IsMalformed(sentence) ? Finding{sentence, kRestore} : FindingOf(sentence));
+        }
+        const std::vector<store::User> users = store::Users(store).List();
+        if (std::ranges::none_of(users, [](const store::User& user) { return user.IsManager(); })) {
+            findings.push_back({"no account may manage this installation", "lookhaven init --admin NAME"});
+        }
+        return findings;
+    } catch (const store::SchemaError& error) {
+        const std::string sentence = error.what();
+        const bool is_newer = sentence.find("newer") != std::string::npos;
+        return {{sentence, is_newer ? "update Lookhaven on this host" : "lookhaven init"}};
+    } catch (const store::StoreError& error) {
+        return {{error.what(), IsMalformed(error.what())
+                                   ? kRestore
+                                   : "check that the file or database server is there and that you have access"}};
+    } catch (const std::exception& error) {
+        return {{error.what(), "check the file \"store\" in the state folder"}};
+    }
+}
+
+}  // namespace lookhaven::cli::doctor

@@ -1,0 +1,148 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What stands between this host and others: the web server, its certificate, IPv6, and the hosts that it is paired with.
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <regex>
+
+#include <netdb.h>
+#include <poll.h>
+#include <sys/socket.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/base/file_descriptor.h"
+#include "standalone/cli/console.h"
+#include "standalone/cli/doctor/checks.h"
+#include "standalone/cli/paired_host.h"
+#include "standalone/cli/units.h"
+#include "standalone/remote/certificate.h"
+
+namespace lookhaven::cli::doctor {
+
+namespace {
+
+constexpr int kTimeoutMs = 3000;
+constexpr std::int64_t kNoticeSeconds = 30 * 86400;
+
+// An address that the web server is told to listen on.
+struct Listener {
+    std::string host;
+    std::string port;
+    bool has_tls = false;
+};
+
+// script/server writes the file; an installation behind another web server has none.
+std::vector<Listener> ListenersOf(const base::Installation& installation) {
+    std::vector<Listener> listeners;
+    std::ifstream file(installation.RunFolder() / "nginx.conf");
+    static const std::regex kListen(R"(^\s*listen (?:(\[::\]|[0-9.]+):)?([0-9]+)( ssl)?.*)");
+    std::smatch match;
+    for (std::string line; std::getline(file, line);) {
+        if (std::regex_match(line, match, kListen)) {
+            const std::string host = match[1] == "[::]" ? "::1" : "127.0.0.1";
+            listeners.push_back({host, match[2], match[3].matched});
+        }
+    }
+    return listeners;
+}
+
+base::FileDescriptor Connect(const Listener& listener) {
+    addrinfo hints{};
+    hints.ai_socktype = SOCK_STREAM;
+    hints.ai_flags = AI_NUMERICHOST | AI_NUMERICSERV;
+    addrinfo* found = nullptr;
+    if (::getaddrinfo(listener.host.c_str(), listener.port.c_str(), &hints, &found) != 0) {
+        return {};
+    }
+    base::FileDescriptor socket(::socket(found->ai_family, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const timeval limit{kTimeoutMs / 1000, 0};
+    ::setsockopt(socket.Get(), SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof limit);
+    ::setsockopt(socket.Get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
+    const bool is_connected = ::connect(socket.Get(), found->ai_addr, found->ai_addrlen) == 0;
+    ::freeaddrinfo(found);
+    return is_connected ? std::move(socket) : base::FileDescriptor();
+}
+
+// Of a TLS port, only that somebody listens.
+bool Answers(const Listener& listener) {
+    constexpr std::string_view kRequest = "GET / HTTP/1.0\r\nHost: localhost\r\n\r\n";
+    const base::FileDescriptor socket = Connect(listener);
+    char byte = 0;
+    return socket && (listener.has_tls || (::send(socket.Get(), kRequest.data(), kRequest.size(), MSG_NOSIGNAL) > 0 &&
+                                           ::recv(socket.Get(), &byte, 1, 0) == 1 && byte == 'H'));
+}
+
+// The file has size 0 even where it has lines.
+bool HasIpv6() {
+    std::ifstream addresses("/proc/net/if_inet6");
+    return addresses.peek() != std::ifstream::traits_type::eof();
+}
+
+}  // namespace
+
+Findings CheckWebServer(const base::Installation& installation) {
+    const std::vector<Listener> listeners = ListenersOf(installation);
+    Findings findings;
+    for (const Listener& listener : listeners) {
+        if (!Answers(listener)) {
+            findings.push_back(
+                {Concat("the web server does not answer at ", listener.host, " port ", listener.port),
+                 "start the server with script/server, or read " + (installation.LogFolder() / "nginx.log").string()});
+        }
+    }
+    if (!listeners.empty() && HasIpv6() && std::ranges::find(listeners, "::1", &Listener::host) == listeners.end()) {
+        findings.push_back({"this machine has IPv6, where the web server does not listen",
+                            "restart the server, which looks for IPv6 when it starts", Severity::kNote});
+    }
+    return findings;
+}
+
+Findings CheckCertificate(const base::Installation& installation) {
+    const std::filesystem::path path = installation.TlsFolder() / "certificate.pem";
+    std::error_code ignored;
+    if (!std::filesystem::exists(path, ignored)) {
+        return ListenersOf(installation).empty()
+                   ? Findings()
+                   : Findings{{"there is no certificate at " + path.string(), "restart the server, which makes one"}};
+    }
+    const std::string remedy =
+        "put another certificate.pem and key.pem there and restart the server; a self-signed one that"
+        " script/server made it replaces by itself";
+    try {
+        const std::int64_t end_s = remote::CertificateEnd(base::ReadFile(path));
+        const std::int64_t left_s = end_s - base::WallSeconds();
+        if (left_s > kNoticeSeconds) {
+            return {};
+        }
+        return {{Concat("the certificate ", path.string(), left_s <= 0 ? " has expired on " : " expires on ",
+                        FormatMoment(end_s)),
+                 remedy, left_s <= 0 ? Severity::kFault : Severity::kNote}};
+    } catch (const std::exception& error) {
+        return {{Concat("the certificate ", path.string(), " cannot be used: ", error.what()), remedy}};
+    }
+}
+
+Findings CheckPairedHosts(const base::Installation& installation) {
+    Findings findings;
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        for (const PairedHostAnswer& answer : AskPairedHosts(store)) {
+            if (!answer.failure.empty()) {
+                findings.push_back(
+                    {Concat("the paired host ", answer.server.name, " at ", answer.server.address, " port ",
+                            answer.server.port, " fails: ", answer.failure),
+                     Concat("mend that, or say where it is now: lookhaven server set ", answer.server.id,
+                            " --address ADDRESS --port PORT; to leave it alone for now: lookhaven server set ",
+                            answer.server.id, " --disable")});
+            }
+        }
+    } catch (const std::exception&) {
+        return {};  // CheckStore reports it
+    }
+    return findings;
+}
+
+}  // namespace lookhaven::cli::doctor

@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Several changes as one.
+#pragma once
+
+#include <functional>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+// Makes all the changes that the function makes by the store's record classes, or, when it throws, none of them.
+void ChangeTogether(Store& store, const std::function<void()>& changes);
+
+}  // namespace lookhaven::store
