@@ -126,8 +126,12 @@ class Retention {
     }
 
     // Tiny files, as of a camera whose format changes all the time, fill a file system before their bytes do.
-    static std::int64_t ExcessFiles(const MountSpace& space) {
-        return space.free_files < 2 * space.ReserveFiles() ? 3 * space.ReserveFiles() - space.free_files : 0;
+    std::int64_t ExcessFiles(const MountSpace& space) const {
+        if (space.free_files >= 2 * space.ReserveFiles()) {
+            return 0;
+        }
+        // Some file systems report none free, whatever they hold.
+        return space.free_files == 0 && folder_.TakesAnotherFile() ? 0 : 3 * space.ReserveFiles() - space.free_files;
     }
 
     // Of what precedes it, all is in excess.
