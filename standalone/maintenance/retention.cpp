@@ -51,13 +51,13 @@ class Retention {
         excess_files_ = ExcessFiles(space);
         // Dated in the future: as old as what was recorded after them.
         std::vector<store::Event> misdated;
-        int after = 0;
+        store::Event after;
         for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
             const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
             std::vector<store::Event> chosen;
             has_more = oldest.size() == kEventsAtOnce;
             for (const store::Event& event : oldest) {
-                after = event.id;
+                after = event;
                 if (IsInExcess(event) || IsExpired(event)) {
                     std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
                     chosen.push_back(event);

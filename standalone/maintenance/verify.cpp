@@ -32,8 +32,7 @@ class Verification {
           events_(store),
           repair_(repair),
           progress_(progress),
-          next_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
-          first_reserved_id_(std::min(next_id_, store::RecorderLease(store).Current().first_reserved_id)) {}
+          next_id_(NewId()) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
@@ -192,8 +191,7 @@ class Verification {
         switch (name.kind) {
         case archive::FileKind::kRecording:
             if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
-                Report("no event has the file " + path,
-                       [&] { return AdoptRecording(events_, mount, mount_id, name, first_reserved_id_); });
+                CheckStrayRecording(mount, mount_id, name, path);
             }
             break;
         case archive::FileKind::kIndex:
@@ -208,6 +206,27 @@ class Verification {
             }
             break;
         }
+    }
+
+    void CheckStrayRecording(const MountFolder& mount, int mount_id, const archive::FileName& name,
+                             const std::string& path) {
+        const int new_id = NewId();
+        if (IsReserved(name.event, new_id)) {
+            report_.faults.push_back(
+                {"no event has the file " + path + " yet: the recorder may be about to store one", ""});
+            return;
+        }
+        Report("no event has the file " + path, [&] { return AdoptRecording(events_, mount, mount_id, name, new_id); });
+    }
+
+    int NewId() { return repair_ ? events_.NextId() : std::numeric_limits<int>::max(); }
+
+    // While the store is out of a recorder's reach, the rows of its finished files wait in its memory; their ids are among
+    // those that were given out to it. new_id was given out after the file was seen and before the lease is read, so a
+    // recorder that takes the lease after this has higher ids.
+    bool IsReserved(int id, int new_id) {
+        const store::LeaseState lease = store::RecorderLease(store_).Current();
+        return !lease.holder.empty() && id >= lease.first_reserved_id && id < new_id;
     }
 
     // True for an event that began after the rows were read.
@@ -231,7 +250,6 @@ class Verification {
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
     const int next_id_;
-    const int first_reserved_id_;  // a recorder may still give out the ids from here on
     VerifyReport report_;
 };
 

@@ -7,7 +7,8 @@
 //               (3) Repair leaves a mount alone as soon as its disk fails: only ENOENT and ENOTDIR mean absent.
 //               (4) While the store has no event of a mount that holds recordings, repair adopts them and removes
 //               nothing.
-// Thread safety One thread. A recorder may run at the same time: what it is writing is left alone.
+// Thread safety One thread. A recorder may run at the same time: what it is writing is left alone, and so is a finished
+//               file whose row it may still hold in memory.
 #pragma once
 
 #include <functional>
