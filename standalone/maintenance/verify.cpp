@@ -27,15 +27,21 @@ constexpr std::int64_t kMinAgeS = 10;
 
 class Verification {
   public:
-    Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress)
+    Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
+                 const std::map<int, std::string>& left_alone)
         : store_(store),
           events_(store),
           repair_(repair),
           progress_(progress),
+          left_alone_(left_alone),
           next_id_(NewId()) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
+            if (const auto why = left_alone_.find(mount.id); why != left_alone_.end()) {
+                report_.faults.push_back({"mount " + std::to_string(mount.id) + " was left alone: " + why->second, ""});
+                continue;
+            }
             try {
                 CheckMount(mount);
             } catch (const std::system_error& failure) {
@@ -249,14 +255,16 @@ class Verification {
     store::Events events_;
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
+    const std::map<int, std::string>& left_alone_;
     const int next_id_;
     VerifyReport report_;
 };
 
 }  // namespace
 
-VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress) {
-    return Verification(store, repair, progress).Run();
+VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
+                    const std::map<int, std::string>& left_alone) {
+    return Verification(store, repair, progress, left_alone).Run();
 }
 
 }  // namespace lookhaven::maintenance
