@@ -122,7 +122,7 @@ class Verification {
         }
         if (!found.problem.empty()) {
             Report(found.problem, [&] { return Repair(mount, row, found); });
-        } else if (row.recording || row.frame_count != found.frames) {
+        } else if (row.recording || row.frame_count != found.shown_frames) {
             CheckProgress(mount, row);
         }
     }
@@ -131,7 +131,7 @@ class Verification {
     void CheckProgress(const MountFolder& mount, const store::Event& before) {
         const std::optional<store::Event> row = events_.Find(before.id);
         const Inspection found = Inspect(mount.Path() / before.path);
-        if (row && !found.is_growing && (row->recording || row->frame_count != found.frames)) {
+        if (row && !found.is_growing && (row->recording || row->frame_count != found.shown_frames)) {
             Report("the row of event " + std::to_string(row->id) + " does not say what its file holds",
                    [&] { return CloseEvent(events_, mount, *row); });
         }
