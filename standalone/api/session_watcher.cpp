@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/session_watcher.h"
 
+#include <algorithm>
 #include <chrono>
 #include <optional>
 #include <thread>
@@ -16,6 +17,7 @@ namespace {
 
 constexpr std::chrono::milliseconds kPeriod{500};
 constexpr std::int64_t kPurgePeriodSeconds = 3600;
+constexpr std::int64_t kMinPurgePauseSeconds = 60;  // after a failure; doubles with each in a row
 
 void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) {
     if (const std::set<std::string> running = slots.Sessions(); !running.empty()) {
@@ -33,14 +35,28 @@ void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) 
     }
 }
 
+// False when it failed. That must not end the watch: an expired session opens nothing, purged or not.
+bool TryToPurge(store::Store& records, std::int64_t now_s) {
+    try {
+        store::Sessions(records).PurgeExpired(now_s);
+        return true;
+    } catch (const store::StoreError& error) {
+        base::LogWarning(std::string("cannot remove expired sessions: ") + error.what());
+        return false;
+    }
+}
+
 void Watch(const base::Installation& installation, control::SlotTable& slots) {
     store::Store records = store::Store::Open(installation.StoreUrl());
-    for (std::int64_t purged_s = 0;; std::this_thread::sleep_for(kPeriod)) {
+    std::int64_t due_s = 0;
+    std::int64_t pause_s = kMinPurgePauseSeconds;
+    for (;; std::this_thread::sleep_for(kPeriod)) {
         const std::int64_t now_s = base::WallSeconds();
         Look(records, slots, now_s);
-        if (now_s - purged_s >= kPurgePeriodSeconds) {
-            store::Sessions(records).PurgeExpired(now_s);
-            purged_s = now_s;
+        if (now_s >= due_s) {
+            const bool is_purged = TryToPurge(records, now_s);
+            due_s = now_s + (is_purged ? kPurgePeriodSeconds : pause_s);
+            pause_s = is_purged ? kMinPurgePauseSeconds : std::min(2 * pause_s, kPurgePeriodSeconds);
         }
     }
 }

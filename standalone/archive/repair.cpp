@@ -12,6 +12,7 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/archive/mount_file.h"
+#include "standalone/archive/recording_reader.h"
 #include "standalone/base/file.h"
 #include "standalone/base/video.h"
 
@@ -71,12 +72,14 @@ void ReplaceIndex(const std::filesystem::path& path, const IndexHeader& header, 
 }
 
 Contents Summary(const IndexHeader& header, const std::vector<FrameEntry>& frames, std::uint64_t recording_bytes,
-                 const std::filesystem::path& index_path) {
+                 const std::filesystem::path& recording) {
     std::uint32_t last_ms = 0;
     for (const FrameEntry& frame : frames) {
         last_ms = std::max(last_ms, frame.time_ms);
     }
-    return {header, static_cast<int>(frames.size()), DurationMs(static_cast<std::int64_t>(frames.size()), last_ms),
+    const std::filesystem::path index_path = IndexPathOf(recording);
+    return {header, RecordingReader(recording).FrameCount(),
+            DurationMs(static_cast<std::int64_t>(frames.size()), last_ms),
             recording_bytes + SizeOf(OpenFile(index_path, O_RDONLY), index_path)};
 }
 
@@ -114,7 +117,7 @@ Contents CloseCrashed(const std::filesystem::path& recording) {
     const std::uint64_t size = SizeOf(file, recording);
     const std::optional<Index> index = ReadIndex(index_path, size);
     if (index && index->is_finished && !index->is_damaged && !index->frames.empty()) {
-        return Summary(index->header, index->frames, size, index_path);
+        return Summary(index->header, index->frames, size, recording);
     }
     std::optional<Walk> walk = WalkRecording(file.Get());
     if (!walk) {
@@ -132,7 +135,7 @@ Contents CloseCrashed(const std::filesystem::path& recording) {
     IndexHeader header = index ? index->header : walk->header;
     header.reason = index ? header.reason : base::kReasonContinuous;  // the file itself does not say
     ReplaceIndex(index_path, header, walk->frames);
-    return Summary(header, walk->frames, std::min(size, walk->end), index_path);
+    return Summary(header, walk->frames, std::min(size, walk->end), recording);
 }
 
 }  // namespace lookhaven::archive

@@ -13,7 +13,7 @@ namespace lookhaven::archive {
 // What a recording holds.
 struct Contents {
     IndexHeader header;
-    int frame_count = 0;
+    int frame_count = 0;           // as RecordingReader's
     std::int64_t duration_ms = 0;  // including the last frame's time on the screen
     std::uint64_t size_bytes = 0;  // of the recording and its index
 };

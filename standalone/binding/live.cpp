@@ -7,6 +7,7 @@
 #include <cstddef>
 #include <optional>
 #include <span>
+#include <utility>
 
 #include <time.h>
 
@@ -74,12 +75,17 @@ bool IsDrained() {
     return queue == nullptr || queue->IsDrained();
 }
 
-// Waits until what was sent before has left. The milliseconds that are left of a ring's longest wait; nothing when it has not
-// left, or a signal came.
+bool TakeOverdueTurn() {
+    binding::SendQueue* queue = RequestContext::Current().Queue();
+    return queue != nullptr && queue->TakeOverdueTurn();
+}
+
+// Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's longest
+// wait; nothing when neither came about, or a signal came.
 std::optional<int> AwaitDrained() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = MonotonicMicros() + ring::kMaxWaitMillis * 1000;
-    while (!IsDrained()) {
+    while (!IsDrained() && !TakeOverdueTurn()) {
         if (MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
             return std::nullopt;
         }
@@ -96,6 +102,7 @@ struct Lag {
     bool has_begun = false;     // the group of pictures that it began with is over, or was caught up with
     bool is_held_back = false;  // a slow connection kept it from the newest frame
     bool is_skipping = false;
+    bool is_sound_held_back = false;
 } g_lag;
 
 // Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that is not. The group
@@ -109,8 +116,32 @@ bool IsSkipped(const ring::Entry& entry) {
     return g_lag.is_skipping;
 }
 
-const ring::Entry* ReadNextVideo(void* stream, int last_sequence, ring::Position* position) {
+// After ten seconds without a frame whatever is older is skipped, so only such a key frame can use the turn.
+bool HasFreshKeyFrame(void* stream) {
+    const ring::Entry* entry = ring::ReadLatestIFrame(stream);
+    const bool is_fresh = entry != nullptr && !IsBehind(*entry);
+    ring::ReadIFrameFinish(stream, entry, nullptr);
+    return is_fresh;
+}
+
+// Sound would fill the connection that the pictures wait for. It waits too, and goes on with the newest where that made
+// it late.
+const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position* position) {
     if (!IsDrained()) {
+        g_lag.is_sound_held_back = true;
+        return nullptr;
+    }
+    const ring::Entry* entry = ring::ReadNext(stream, last_sequence, position);
+    if (entry == nullptr || !std::exchange(g_lag.is_sound_held_back, false) || !IsBehind(*entry)) {
+        return entry;
+    }
+    last_sequence = entry->sequence;
+    ring::ReadFinish(stream, entry, position);
+    return ring::ReadLatest(stream, last_sequence, position, 0);
+}
+
+const ring::Entry* ReadNextVideo(void* stream, int last_sequence, ring::Position* position) {
+    if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverdueTurn())) {
         g_lag.is_held_back = true;
         return nullptr;
     }
@@ -220,7 +251,7 @@ DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* positio
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
     if (ring::MediumOf(this) != base::Medium::kVideo) {
-        return Held(ring::ReadNext(this, lastSeq, Inner(position)));
+        return Held(ReadNextSound(this, lastSeq, Inner(position)));
     }
     return Held(ReadNextVideo(this, lastSeq, Inner(position)));
 }

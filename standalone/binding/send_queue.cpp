@@ -144,7 +144,11 @@ bool SendQueue::IsDrained() {
     }
     drained_in_a_row_ = 0;
     long_since_us_ = long_since_us_.value_or(now_us);
-    if (now_us - *long_since_us_ < kMaxWaitUs) {
+    return false;
+}
+
+bool SendQueue::TakeOverdueTurn() {
+    if (!long_since_us_ || base::MonotonicMicros() - *long_since_us_ < kMaxWaitUs) {
         return false;
     }
     long_since_us_.reset();

@@ -34,8 +34,10 @@ class LH_PLATFORM_API SendQueue {
     SendQueue(int socket, TcpConnection connection);
 
     // Whether what is sent now arrives soon: little waits, or no more than the viewer has lately taken within 100 ms.
-    // After ten seconds of waiting it is true in any case, so that the slowest viewer gets a picture now and then.
     bool IsDrained();
+    // It has not been drained for ten seconds: the slowest viewer gets a picture now and then. Once true, the ten seconds
+    // begin anew: ask only where there is a picture to send.
+    bool TakeOverdueTurn();
 
   private:
     struct Tcp {

@@ -139,11 +139,12 @@ void Change(const Console& console, const Request& request) {
     console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
 }
 
-// Nothing when the disk is not there or fails.
+// Nothing when the disk is not there, fails or does not say.
 std::optional<std::int64_t> FreeBytes(store::Store& store, const Mount& mount) {
     try {
         const auto folder = maintenance::OpenMount(store, mount);
-        return folder ? std::optional(folder->Space().free_bytes) : std::nullopt;
+        const maintenance::MountSpace space = folder ? folder->Space() : maintenance::MountSpace{};
+        return space.total_bytes > 0 ? std::optional(space.free_bytes) : std::nullopt;
     } catch (const std::system_error&) {
         return std::nullopt;
     }

@@ -3,6 +3,9 @@
 // lookhaven verify: compares the store's events with the files on the mounts.
 #include <algorithm>
 #include <iostream>
+#include <map>
+#include <string>
+#include <system_error>
 
 #include <unistd.h>
 
@@ -27,31 +30,37 @@ struct Request {
     bool repair = false;
 };
 
-// Repair would rename and forget what a recorder of another state folder with the same mounts has recorded.
-void RequireOwnMounts(store::Store& store, const base::Installation& installation) {
+// Repair would rename and forget what a recorder of another state folder with the same mounts has recorded. Returns the
+// mounts of which that cannot be told, by id, and why.
+std::map<int, std::string> RequireOwnMounts(store::Store& store, const base::Installation& installation) {
     control::CommonConfig* config = control::MapCommonConfig(installation);
     const bool is_running = config != nullptr && control::IsRecorderAlive(*config);
     const auto states =
         is_running ? maintenance::ReadMountStatus(installation) : std::vector<maintenance::MountStatus>();
+    std::map<int, std::string> unknown;
     for (const store::Mount& mount : store::Mounts(store).List()) {
         const bool is_refused = std::ranges::any_of(states, [&](const maintenance::MountStatus& status) {
             return status.mount == mount.id && status.state == maintenance::MountState::kInUse;
         });
-        if (maintenance::OpenMount(store, mount) && (is_refused || !is_running) &&
-            maintenance::MountLock::IsHeld(mount.path)) {
-            throw Failure(kDataError, "the recorder of another state folder uses the mount at ", mount.path);
+        try {
+            if (maintenance::OpenMount(store, mount) && (is_refused || !is_running) &&
+                maintenance::MountLock::IsHeld(mount.path)) {
+                throw Failure(kDataError, "the recorder of another state folder uses the mount at ", mount.path);
+            }
+        } catch (const std::system_error& failure) {
+            unknown.emplace(mount.id, failure.what());
         }
     }
+    return unknown;
 }
 
 void Verify(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    if (request.repair) {
-        RequireOwnMounts(store, console.Installation());
-    }
+    const std::map<int, std::string> left_alone =
+        request.repair ? RequireOwnMounts(store, console.Installation()) : std::map<int, std::string>();
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;
     const maintenance::VerifyReport report = maintenance::Verify(
-        store, request.repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>());
+        store, request.repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>(), left_alone);
     Json::Value faults = Json::arrayValue;
     std::string text;
     std::size_t left = 0;

@@ -13,6 +13,7 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/matroska_blocks.h"
 #include "standalone/archive/mount_file.h"
+#include "standalone/archive/recording_reader.h"
 
 namespace lookhaven::maintenance {
 
@@ -72,6 +73,7 @@ Inspection Inspect(const std::filesystem::path& path) {
         result.problem = "the recording " + path.string() + " cannot be read: " + failure.what();
     }
     if (found == indexed && result.problem.empty()) {
+        result.shown_frames = archive::RecordingReader(path).FrameCount();
         return result;
     }
     result.is_damaged_inside = found.size() < indexed.size() && std::equal(found.begin(), found.end(), indexed.begin());

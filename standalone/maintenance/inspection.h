@@ -18,6 +18,7 @@ struct Inspection {
     // Damage in the middle; the frames after it, which the index names, may still be read.
     bool is_damaged_inside = false;
     std::int64_t frames = 0;
+    std::int64_t shown_frames = 0;  // as players count them; when there is no problem
 };
 
 // Reads all of the file but its frames. A file that cannot be used is a problem, not a failure; throws std::system_error

@@ -30,6 +30,9 @@ constexpr std::string_view kMarkerOwner = " of ";
 // Above this a folder's name is a number of somebody else's.
 constexpr int kMaxCamera = 1'000'000;
 constexpr const char* kLogName = "seconds";
+constexpr const char* kProbeName = ".lookhaven-probe";
+// Of a file system that does not say.
+constexpr std::int64_t kPlentyBytes = std::int64_t{1} << 50;
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
 std::string MarkerText(const MountMarker& marker) {
@@ -81,6 +84,21 @@ std::vector<std::string> NamesIn(int folder) {
         base::ThrowErrno("cannot list a folder of recordings");
     }
     return names;
+}
+
+// What a file system does not know it reports as 0 or -1.
+MountSpace SpaceFrom(const struct statvfs& report) {
+    const auto bytes = [&](std::uint64_t blocks) { return static_cast<std::int64_t>(blocks * report.f_frsize); };
+    MountSpace space{bytes(report.f_blocks), std::max<std::int64_t>(bytes(report.f_bavail), 0),
+                     static_cast<std::int64_t>(report.f_files), static_cast<std::int64_t>(report.f_favail)};
+    if (space.total_bytes <= 0) {
+        space.total_bytes = 0;
+        space.free_bytes = kPlentyBytes;
+    }
+    if (space.total_files <= 0 || space.free_files < 0) {
+        space.total_files = space.free_files = 0;
+    }
+    return space;
 }
 
 std::string FileNameOf(const archive::FileName& name) {
@@ -142,9 +160,18 @@ MountSpace MountFolder::Space() const {
     if (::fstatvfs(folder_.Get(), &status) != 0) {
         base::ThrowErrno("cannot find out the free space on " + path_.string());
     }
-    const auto block = static_cast<std::int64_t>(status.f_frsize);
-    return {static_cast<std::int64_t>(status.f_blocks) * block, static_cast<std::int64_t>(status.f_bavail) * block,
-            static_cast<std::int64_t>(status.f_files), static_cast<std::int64_t>(status.f_favail)};
+    return SpaceFrom(status);
+}
+
+bool MountFolder::TakesAnotherFile() const {
+    ::unlinkat(folder_.Get(), kProbeName, 0);  // of a process that was killed here
+    const base::FileDescriptor probe(
+        ::openat(folder_.Get(), kProbeName, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!probe && errno != ENOSPC && errno != EDQUOT) {
+        base::ThrowErrno("cannot make a file on " + path_.string());
+    }
+    ::unlinkat(folder_.Get(), kProbeName, 0);
+    return static_cast<bool>(probe);
 }
 
 base::FileDescriptor MountFolder::OpenDay(int camera, std::int64_t second) const {

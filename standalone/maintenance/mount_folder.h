@@ -5,7 +5,8 @@
 // Why so        A disk that is not mounted leaves an empty folder, which looks like a mount whose recordings are gone;
 //               rows must not be removed for that. So a mount carries a marker, the file .lookhaven-mount. It says
 //               whose mount it is, too: two installations on one folder would remove each other's footage.
-// Invariants    (1) Only the files of archive/layout.h are ever removed, and folders that became empty.
+// Invariants    (1) Only the files of archive/layout.h are ever removed, folders that became empty, and the file of
+//               TakesAnotherFile.
 //               (2) Everything is opened relative to the mount's own descriptor and without following symbolic links:
 //               no call leaves the mount.
 #pragma once
@@ -23,8 +24,8 @@
 namespace lookhaven::maintenance {
 
 struct MountSpace {
-    std::int64_t total_bytes = 0;
-    std::int64_t free_bytes = 0;   // available to this process, not to root
+    std::int64_t total_bytes = 0;  // 0 where the file system does not say
+    std::int64_t free_bytes = 0;   // available to this process, not to root; plenty where the file system does not say
     std::int64_t total_files = 0;  // that the file system has room for; 0 where it has no such limit
     std::int64_t free_files = 0;
 
@@ -62,6 +63,9 @@ class MountFolder {
     const std::filesystem::path& Path() const { return path_; }
     // Throws std::system_error.
     MountSpace Space() const;
+    // Whether the file system has room for one more file, as making one shows. Throws std::system_error when neither can
+    // be told.
+    bool TakesAnotherFile() const;
 
     // Whether anything of the camera was recorded on that UTC day.
     bool HasDay(int camera, std::int64_t second) const { return static_cast<bool>(OpenDay(camera, second)); }

@@ -36,7 +36,7 @@ bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, 
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
         if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_reserved_id &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
-            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, first_reserved_id); });
+            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, events.NextId()); });
         }
     }
     return is_complete;

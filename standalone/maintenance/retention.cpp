@@ -51,13 +51,13 @@ class Retention {
         excess_files_ = ExcessFiles(space);
         // Dated in the future: as old as what was recorded after them.
         std::vector<store::Event> misdated;
-        int after = 0;
+        store::Event after;
         for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
             const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
             std::vector<store::Event> chosen;
             has_more = oldest.size() == kEventsAtOnce;
             for (const store::Event& event : oldest) {
-                after = event.id;
+                after = event;
                 if (IsInExcess(event) || IsExpired(event)) {
                     std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
                     chosen.push_back(event);
@@ -126,8 +126,12 @@ class Retention {
     }
 
     // Tiny files, as of a camera whose format changes all the time, fill a file system before their bytes do.
-    static std::int64_t ExcessFiles(const MountSpace& space) {
-        return space.free_files < 2 * space.ReserveFiles() ? 3 * space.ReserveFiles() - space.free_files : 0;
+    std::int64_t ExcessFiles(const MountSpace& space) const {
+        if (space.free_files >= 2 * space.ReserveFiles()) {
+            return 0;
+        }
+        // Some file systems report none free, whatever they hold.
+        return space.free_files == 0 && folder_.TakesAnotherFile() ? 0 : 3 * space.ReserveFiles() - space.free_files;
     }
 
     // Of what precedes it, all is in excess.

@@ -84,20 +84,28 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
 }
 
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int first_reserved_id) {
+                           int new_id) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
+    const std::optional<store::Event> present = events.Find(name.event);
+    if (IsRowOf(present, name)) {
+        return "its event has come meanwhile";
+    }
     if (contents.frame_count == 0) {
         return Discard(mount, name);
     }
-    archive::FileName kept = name;
-    if (name.event >= first_reserved_id || events.Find(name.event)) {
-        kept.event = events.NextId();
-        if (!mount.Renumber(name, kept.event)) {
-            return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";
-        }
+    if (!present && name.event <= new_id) {
+        events.Begin(RowOf(name, mount_id, contents));
+        return "adopted " + (mount.Path() / archive::PathOf(name)).string();
     }
-    events.Begin(RowOf(kept, mount_id, contents));
-    return "adopted " + (mount.Path() / archive::PathOf(kept)).string();
+    archive::FileName renamed = name;
+    renamed.event = new_id;
+    if (!mount.Renumber(name, new_id)) {
+        return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";
+    }
+    store::Event row = RowOf(renamed, mount_id, contents);
+    row.order = events.OrderByDate(mount_id, row.start_s);
+    events.Begin(row);
+    return "adopted " + (mount.Path() / row.path).string();
 }
 
 bool IsRowOf(const std::optional<store::Event>& row, const archive::FileName& name) {

@@ -27,16 +27,21 @@ constexpr std::int64_t kMinAgeS = 10;
 
 class Verification {
   public:
-    Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress)
+    Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
+                 const std::map<int, std::string>& left_alone)
         : store_(store),
           events_(store),
           repair_(repair),
           progress_(progress),
-          next_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()),
-          first_reserved_id_(std::min(next_id_, store::RecorderLease(store).Current().first_reserved_id)) {}
+          left_alone_(left_alone),
+          next_id_(NewId()) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
+            if (const auto why = left_alone_.find(mount.id); why != left_alone_.end()) {
+                report_.faults.push_back({"mount " + std::to_string(mount.id) + " was left alone: " + why->second, ""});
+                continue;
+            }
             try {
                 CheckMount(mount);
             } catch (const std::system_error& failure) {
@@ -117,7 +122,7 @@ class Verification {
         }
         if (!found.problem.empty()) {
             Report(found.problem, [&] { return Repair(mount, row, found); });
-        } else if (row.recording || row.frame_count != found.frames) {
+        } else if (row.recording || row.frame_count != found.shown_frames) {
             CheckProgress(mount, row);
         }
     }
@@ -126,7 +131,7 @@ class Verification {
     void CheckProgress(const MountFolder& mount, const store::Event& before) {
         const std::optional<store::Event> row = events_.Find(before.id);
         const Inspection found = Inspect(mount.Path() / before.path);
-        if (row && !found.is_growing && (row->recording || row->frame_count != found.frames)) {
+        if (row && !found.is_growing && (row->recording || row->frame_count != found.shown_frames)) {
             Report("the row of event " + std::to_string(row->id) + " does not say what its file holds",
                    [&] { return CloseEvent(events_, mount, *row); });
         }
@@ -192,8 +197,7 @@ class Verification {
         switch (name.kind) {
         case archive::FileKind::kRecording:
             if (mount.Has(name) && !HasRow(name) && !Inspect(path).is_growing) {
-                Report("no event has the file " + path,
-                       [&] { return AdoptRecording(events_, mount, mount_id, name, first_reserved_id_); });
+                CheckStrayRecording(mount, mount_id, name, path);
             }
             break;
         case archive::FileKind::kIndex:
@@ -208,6 +212,27 @@ class Verification {
             }
             break;
         }
+    }
+
+    void CheckStrayRecording(const MountFolder& mount, int mount_id, const archive::FileName& name,
+                             const std::string& path) {
+        const int new_id = NewId();
+        if (IsReserved(name.event, new_id)) {
+            report_.faults.push_back(
+                {"no event has the file " + path + " yet: the recorder may be about to store one", ""});
+            return;
+        }
+        Report("no event has the file " + path, [&] { return AdoptRecording(events_, mount, mount_id, name, new_id); });
+    }
+
+    int NewId() { return repair_ ? events_.NextId() : std::numeric_limits<int>::max(); }
+
+    // While the store is out of a recorder's reach, the rows of its finished files wait in its memory; their ids are among
+    // those that were given out to it. new_id was given out after the file was seen and before the lease is read, so a
+    // recorder that takes the lease after this has higher ids.
+    bool IsReserved(int id, int new_id) {
+        const store::LeaseState lease = store::RecorderLease(store_).Current();
+        return !lease.holder.empty() && id >= lease.first_reserved_id && id < new_id;
     }
 
     // True for an event that began after the rows were read.
@@ -230,15 +255,16 @@ class Verification {
     store::Events events_;
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
+    const std::map<int, std::string>& left_alone_;
     const int next_id_;
-    const int first_reserved_id_;  // a recorder may still give out the ids from here on
     VerifyReport report_;
 };
 
 }  // namespace
 
-VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress) {
-    return Verification(store, repair, progress).Run();
+VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
+                    const std::map<int, std::string>& left_alone) {
+    return Verification(store, repair, progress, left_alone).Run();
 }
 
 }  // namespace lookhaven::maintenance

@@ -7,10 +7,12 @@
 //               (3) Repair leaves a mount alone as soon as its disk fails: only ENOENT and ENOTDIR mean absent.
 //               (4) While the store has no event of a mount that holds recordings, repair adopts them and removes
 //               nothing.
-// Thread safety One thread. A recorder may run at the same time: what it is writing is left alone.
+// Thread safety One thread. A recorder may run at the same time: what it is writing is left alone, and so is a finished
+//               file whose row it may still hold in memory.
 #pragma once
 
 #include <functional>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -30,9 +32,10 @@ struct VerifyReport {
 };
 
 // Reads the head of every frame: about a second for five hours of recordings. progress, when given, is called with the
-// number of events done and of all events, counted separately for each mount. Throws store::StoreError; trouble with
-// one file is reported as a fault.
+// number of events done and of all events, counted separately for each mount. left_alone: mounts by id that must not be
+// touched, and why; each is reported as a fault. Throws store::StoreError; trouble with one file is reported as a fault.
 VerifyReport Verify(store::Store& store, bool repair,
-                    const std::function<void(std::size_t, std::size_t)>& progress = {});
+                    const std::function<void(std::size_t, std::size_t)>& progress = {},
+                    const std::map<int, std::string>& left_alone = {});
 
 }  // namespace lookhaven::maintenance

@@ -91,6 +91,7 @@ std::optional<int> EventRowQueue::FirstReservedId() const {
 }
 
 void EventRowQueue::RequestStop() {
+    is_stopping_ = true;
     thread_.Ask();
     thread_.RequestStop();
 }
@@ -113,9 +114,12 @@ void EventRowQueue::Work(store::Store& store) {
     for (const int id : dirty) {
         is_all_stored &= StoreRow(events, id);
     }
-    if (HoldLease(store)) {
-        FillReserve(events);
-        HoldLease(store);  // tells which ids are taken
+    if (is_stopping_) {
+        if (is_all_stored) {
+            ReleaseLease(store);
+        }
+    } else if (HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
+        FillReserve(store);
     }
     std::vector<store::Mark> pending = store::Marks(store).Pending();
     const std::lock_guard lock(mutex_);
@@ -126,18 +130,27 @@ void EventRowQueue::Work(store::Store& store) {
     }
 }
 
-bool EventRowQueue::HoldLease(store::Store& store) {
-    const bool is_held = lease_.Hold(store, FirstReservedId().value_or(std::numeric_limits<int>::max()));
+bool EventRowQueue::HoldLease(store::Store& store, int first_reserved_id) {
+    const bool is_held = lease_.Hold(store, first_reserved_id);
     is_refused_ = !is_held;
     if (!is_held) {
-        const std::lock_guard lock(mutex_);
-        reserve_.clear();
-        first_reserved_id_.reset();
+        ForgetReserve();
     }
     return is_held;
 }
 
-void EventRowQueue::FillReserve(store::Events& events) {
+void EventRowQueue::ReleaseLease(store::Store& store) {
+    ForgetReserve();
+    lease_.Release(store);
+}
+
+void EventRowQueue::ForgetReserve() {
+    const std::lock_guard lock(mutex_);
+    reserve_.clear();
+    first_reserved_id_.reset();
+}
+
+void EventRowQueue::FillReserve(store::Store& store) {
     std::size_t missing = 0;
     bool is_first = false;
     {
@@ -151,7 +164,11 @@ void EventRowQueue::FillReserve(store::Events& events) {
         return;
     }
     const int count = static_cast<int>(std::max<std::size_t>(missing, 1));
-    const int first = events.NextIds(count);
+    const int first = store::Events(store).NextIds(count);
+    // Told before the first of them is used: verify leaves files with these ids alone.
+    if (is_first && !HoldLease(store, first)) {
+        return;
+    }
     const std::lock_guard lock(mutex_);
     first_reserved_id_ = first_reserved_id_.value_or(first);
     for (int id = first; id < first + count; ++id) {

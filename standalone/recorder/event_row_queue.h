@@ -54,7 +54,7 @@ class EventRowQueue {
     // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
     std::optional<int> FirstReservedId() const;
 
-    // As in StoreThread; rows already queued are stored first.
+    // As in StoreThread; rows already queued are stored first, and the lease is given back.
     void RequestStop();
     bool HasEnded() const { return thread_.HasEnded(); }
 
@@ -66,8 +66,10 @@ class EventRowQueue {
     };
 
     void Work(store::Store& store);
-    bool HoldLease(store::Store& store);
-    void FillReserve(store::Events& events);
+    bool HoldLease(store::Store& store, int first_reserved_id);
+    void ReleaseLease(store::Store& store);
+    void ForgetReserve();
+    void FillReserve(store::Store& store);
     bool StoreRow(store::Events& events, int id);
 
     mutable std::mutex mutex_;
@@ -81,6 +83,7 @@ class EventRowQueue {
     std::int64_t stored_s_ = 0;
     LeaseKeeper lease_;  // only the thread uses it
     std::atomic<bool> is_refused_ = false;
+    std::atomic<bool> is_stopping_ = false;
     StoreThread thread_;  // last: it uses the others
 };
 

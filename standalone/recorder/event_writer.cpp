@@ -2,10 +2,12 @@
 #include "standalone/recorder/event_writer.h"
 
 #include <algorithm>
+#include <exception>
 #include <utility>
 
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
+#include "standalone/archive/recording_reader.h"
 
 namespace lookhaven::recorder {
 
@@ -25,6 +27,16 @@ store::Event RowOf(const EventStart& start, const media::MediaFormat& format) {
     row.height = format.video.height;
     row.path = archive::PathOf({start.camera, row.start_s, start.id, archive::FileKind::kRecording});
     return row;
+}
+
+// Of a finished recording, as players count: where pictures are far apart, one is shown again each second.
+int ShownFrames(const std::filesystem::path& recording, int written) {
+    try {
+        const archive::RecordingReader reader(recording);
+        return reader.Grows() ? written : reader.FrameCount();
+    } catch (const std::exception&) {
+        return written;  // verify puts it right
+    }
 }
 
 std::filesystem::path PathWithFolder(const EventStart& start, const store::Event& row) {
@@ -82,7 +94,8 @@ void EventWriter::NoteProgress() {
     if (writer_.FrameCount() == row_.frame_count && row_.recording) {
         return;
     }
-    row_.frame_count = writer_.FrameCount();
+    row_.frame_count =
+        row_.recording ? writer_.FrameCount() : ShownFrames(start_.mount / row_.path, writer_.FrameCount());
     row_.size_bytes = static_cast<std::int64_t>(writer_.SizeBytes());
     row_.end_s = EndS();
     if (row_.frame_count > 0) {

@@ -28,6 +28,13 @@ bool LeaseKeeper::Hold(store::Store& store, int first_reserved_id) {
     return held_count_.has_value();
 }
 
+void LeaseKeeper::Release(store::Store& store) {
+    if (held_count_) {
+        store::RecorderLease(store).Release(*held_count_, name_);
+        held_count_.reset();
+    }
+}
+
 bool LeaseKeeper::MayTake(const store::LeaseState& state, std::int64_t now_us) {
     if (held_count_) {
         // A store that lost its last second, as after a crash of its server, has an older count of ours.

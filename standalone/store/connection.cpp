@@ -18,6 +18,8 @@ constexpr std::string_view kPostgresqlPrefix = "postgresql:";
 
 // How long a writer waits for another one.
 constexpr const char* kBusyTimeoutS = "5";
+constexpr const char* kBusyTimeoutMs = "5000";
+constexpr const char* kBriefTimeoutMs = "20";
 
 constexpr std::size_t kMaxNameBytes = 64;
 
@@ -90,43 +92,62 @@ bool Connection::HasTable(const std::string& name) {
 
 // SQLite's plain begin takes no lock: a transaction that reads and then writes would fail at once, whatever the
 // time-out, when somebody wrote in between.
-Connection::Transaction::Transaction(Connection& connection, Durability durability)
+Connection::Transaction::Transaction(Connection& connection)
     : session_(connection.session_),
       open_transactions_(connection.open_transactions_),
-      is_part_(open_transactions_ > 0) {
+      is_part_(open_transactions_++ > 0) {}
+
+Connection::Transaction::Transaction(Connection& connection, Durability durability, Patience patience)
+    : Transaction(connection) {  // so the destructor restores the settings when this fails, too
     if (is_part_) {
         return;
     }
-    const bool lazy = durability == Durability::kLazy;
-    if (lazy && connection.IsSqlite()) {
-        session_ << "pragma synchronous = normal";  // takes no effect inside a transaction
-        restore_sync_ = true;
+    const bool is_lazy = durability == Durability::kLazy;
+    const bool gives_up = patience == Patience::kGivesUp;
+    if (connection.IsSqlite()) {
+        if (is_lazy) {
+            SetUntilEnd("synchronous", "normal", "full");  // takes no effect inside a transaction
+        }
+        if (gives_up) {
+            SetUntilEnd("busy_timeout", kBriefTimeoutMs, kBusyTimeoutMs);
+        }
     }
     session_ << (connection.IsSqlite() ? "begin immediate" : "begin");
-    if (lazy && !connection.IsSqlite()) {
-        session_ << "set local synchronous_commit = off";
+    is_open_ = true;
+    if (!connection.IsSqlite()) {
+        if (is_lazy) {
+            session_ << "set local synchronous_commit = off";
+        }
+        if (gives_up) {
+            session_ << std::string("set local lock_timeout = ") + kBriefTimeoutMs;
+        }
     }
-    ++open_transactions_;
+}
+
+void Connection::Transaction::SetUntilEnd(const std::string& setting, const std::string& value,
+                                          const std::string& usual_value) {
+    restore_.push_back("pragma " + setting + " = " + usual_value);
+    session_ << "pragma " + setting + " = " + value;
 }
 
 void Connection::Transaction::Commit() {
     if (!is_part_) {
         session_ << "commit";
     }
-    open_ = false;
+    is_open_ = false;
 }
 
 Connection::Transaction::~Transaction() {
+    --open_transactions_;
     if (is_part_) {
         return;
     }
-    --open_transactions_;
     try {
-        if (open_) {
+        if (is_open_) {
             session_ << "rollback";
         }
-        if (restore_sync_) {
-            session_ << "pragma synchronous = full";
+        for (const std::string& statement : restore_) {
+            session_ << statement;
         }
     } catch (const soci::soci_error&) {
         // The connection is gone, and the transaction with it.

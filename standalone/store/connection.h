@@ -22,6 +22,9 @@ enum class Engine { kSqlite, kPostgresql };
 // supersedes, need not wait for the disk.
 enum class Durability { kSafe, kLazy };
 
+// Whether a change waits for another writer, or fails at once: what can as well be done later must not hold up a request.
+enum class Patience { kWaits, kGivesUp };
+
 // A store's URL, parsed.
 struct StoreAddress {
     Engine engine;
@@ -54,9 +57,9 @@ class Connection {
     // Calls change(session) inside a transaction, which is rolled back when change throws. Inside another Write it is a part
     // of that one, and what it throws must end that one.
     template <typename Change>
-    auto Write(Change&& change, Durability durability = Durability::kSafe) {
+    auto Write(Change&& change, Durability durability = Durability::kSafe, Patience patience = Patience::kWaits) {
         return Read([&](soci::session& sql) {
-            Transaction transaction(*this, durability);
+            Transaction transaction(*this, durability, patience);
             if constexpr (std::is_void_v<decltype(change(sql))>) {
                 change(sql);
                 transaction.Commit();
@@ -86,18 +89,21 @@ class Connection {
   private:
     class Transaction {
       public:
-        Transaction(Connection& connection, Durability durability);
+        Transaction(Connection& connection, Durability durability, Patience patience);
         Transaction(const Transaction&) = delete;
         Transaction& operator=(const Transaction&) = delete;
         ~Transaction();
         void Commit();
 
       private:
+        explicit Transaction(Connection& connection);
+        void SetUntilEnd(const std::string& setting, const std::string& value, const std::string& usual_value);
+
         soci::session& session_;
         int& open_transactions_;
         const bool is_part_;
-        bool restore_sync_ = false;
-        bool open_ = true;
+        std::vector<std::string> restore_;
+        bool is_open_ = false;
     };
 
     Engine engine_;

@@ -101,11 +101,17 @@ std::vector<Event> Events::PendingDeletion(int mount_id) {
     return events;
 }
 
-std::vector<Event> Events::InRecordingOrder(int mount_id, int after_id, int limit) {
+std::vector<Event> Events::InRecordingOrder(int mount_id, const Event& after, int limit) {
     return connection_.FetchAll<Event>(
-        "where mount_id = :mount and id > :after and recording = 0 and archived = 0 and demo = 0 order by id"
-        " limit :limit",
-        mount_id, after_id, limit);
+        "where mount_id = :mount and (recording_order, id) > (:after_order, :after_id) and recording = 0"
+        " and archived = 0 and demo = 0 order by recording_order, id limit :limit",
+        mount_id, after.order, after.id, limit);
+}
+
+std::int64_t Events::OrderByDate(int mount_id, std::int64_t start_s) {
+    const std::vector<Event> next =
+        List({.camera_ids = CamerasOn(mount_id), .mount_id = mount_id, .begin_s = start_s, .limit = 1});
+    return next.empty() ? kOrderOfId : next.front().order - 1;
 }
 
 void Events::VisitMount(int mount_id, const Visitor& visitor) {

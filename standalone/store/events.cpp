@@ -51,6 +51,11 @@ bool SetProgress(Connection& connection, int id, std::int64_t end_s, int frame_c
         durability);
 }
 
+Event WithOrder(Event event) {
+    event.order = event.order == kOrderOfId ? event.id : event.order;
+    return event;
+}
+
 // Runs the statement for each id; returns the number of rows changed.
 int ForEachId(soci::session& sql, std::span<const int> ids, const std::string& text) {
     int id = 0;
@@ -89,7 +94,7 @@ void Events::Begin(const Event& event) {
         if (Exists(sql, "select id from events where id = :id", event.id)) {
             throw AlreadyExists("there is already an event " + std::to_string(event.id));
         }
-        Insert(sql, event);
+        Insert(sql, WithOrder(event));
     });
 }
 
@@ -102,6 +107,7 @@ void Events::AddAll(std::span<const Event> events) {
         for (const Event& event : events) {
             row = event;
             row.id = id++;
+            row.order = row.id;
             Run(insert);
         }
     });

@@ -24,6 +24,9 @@
 
 namespace lookhaven::store {
 
+// The place in the order of recording that an event has by its id.
+constexpr std::int64_t kOrderOfId = std::numeric_limits<std::int64_t>::min();
+
 struct Event {
     int id = 0;
     int camera_id = 0;
@@ -41,6 +44,9 @@ struct Event {
     std::string path;       // relative to the mount
     bool archived = false;  // retention leaves it alone
     bool demo = false;      // demo data: there is no file
+    // Lower is earlier, whatever the clock said. Its id, but for old recordings that got a new id; kOrderOfId until the
+    // row is stored.
+    std::int64_t order = kOrderOfId;
 
     friend bool operator==(const Event&, const Event&) = default;
 };
@@ -110,9 +116,12 @@ class Events {
 
     // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();
-    // Finished events of the mount that are neither archived nor demo, with ids above after_id, by id: in the order in
-    // which they were recorded, whatever the clock said.
-    std::vector<Event> InRecordingOrder(int mount_id, int after_id, int limit);
+    // Finished events of the mount that are neither archived nor demo, in the order in which they were recorded: those
+    // after that event, from the first on after Event().
+    std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
+    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far as
+    // dates tell. kOrderOfId when that is nothing.
+    std::int64_t OrderByDate(int mount_id, std::int64_t start_s);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.

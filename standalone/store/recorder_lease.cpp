@@ -38,4 +38,15 @@ bool RecorderLease::Take(std::int64_t count, const std::string& holder, int firs
         Durability::kLazy);
 }
 
+void RecorderLease::Release(std::int64_t count, const std::string& holder) {
+    connection_.Write(
+        [&](soci::session& sql) {
+            Execute(sql,
+                    "update recorder_lease set count = count + 1, holder = ''"
+                    " where count = :count and holder = :holder",
+                    count, holder);
+        },
+        Durability::kLazy);
+}
+
 }  // namespace lookhaven::store

@@ -17,7 +17,7 @@
 namespace lookhaven::store {
 
 struct LeaseState {
-    std::string holder;         // empty while nobody has had it
+    std::string holder;         // empty while nobody has it
     std::int64_t count = 0;     // grows whenever the holder renews it
     int first_reserved_id = 0;  // event ids from here on may be in the holder's reserve
 
@@ -35,6 +35,9 @@ class RecorderLease {
     LeaseState Current();
     // Takes or renews the lease if its count is still that one. False when somebody else was faster.
     bool Take(std::int64_t count, const std::string& holder, int first_reserved_id);
+    // Gives the lease back, so that another recorder need not wait; does nothing when it is no longer the holder's with
+    // that count.
+    void Release(std::int64_t count, const std::string& holder);
 
   private:
     Connection& connection_;

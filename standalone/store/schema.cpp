@@ -144,6 +144,17 @@ constexpr const char* kInsecureCameras[] = {
     "update cameras set insecure = 1 where id in (select camera_id from camera_profiles where source like 'https:%')",
 };
 
+// The order was that of ids, which says nothing of an old recording that got a new one.
+constexpr const char* kRenumberedRecordings[] = {
+    "alter table events add column recording_order bigint not null default 0",
+    "update events set recording_order = id",
+    "alter table events_pending_deletion add column recording_order bigint not null default 0",
+    "update events_pending_deletion set recording_order = id",
+    "drop index events_by_order",
+    "create index events_by_order on events (mount_id, recording_order, id, size_bytes)"
+    " where recording = 0 and archived = 0 and demo = 0",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -151,6 +162,7 @@ constexpr Migration kMigrations[] = {
     {"who reported a mark, and who may", kReporters},
     {"events pending deletion, the order of recording, the recorder lease", kRecordingOrder},
     {"cameras whose HTTPS certificate is not verified", kInsecureCameras},
+    {"the order of recordings that got a new id", kRenumberedRecordings},
 };
 
 }  // namespace

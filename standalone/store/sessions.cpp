@@ -73,11 +73,14 @@ std::optional<Session> Sessions::FindBySecret(std::string_view secret, std::int6
 }
 
 bool Sessions::Touch(const Session& session, std::int64_t now_s) {
+    const auto touch = [&](soci::session& sql) {
+        return Execute(sql,
+                       "update sessions set last_seen = :now, expires = :expires"
+                       " where handle = :handle and last_seen <= :due",
+                       now_s, EndOf(lifetime_, session.created_s, now_s), session.handle, now_s - kTouchEveryS) > 0;
+    };
     return now_s >= session.last_seen_s + kTouchEveryS &&
-           connection_.Execute("update sessions set last_seen = :now, expires = :expires"
-                               " where handle = :handle and last_seen <= :due",
-                               now_s, EndOf(lifetime_, session.created_s, now_s), session.handle,
-                               now_s - kTouchEveryS) > 0;
+           connection_.Write(touch, Durability::kLazy, Patience::kGivesUp);
 }
 
 bool Sessions::End(std::string_view handle) {
@@ -102,7 +105,9 @@ std::vector<std::string> Sessions::EndedAmong(const std::vector<std::string>& ha
 }
 
 int Sessions::PurgeExpired(std::int64_t now_s) {
-    return connection_.Execute("delete from sessions where expires <= :now", now_s);
+    return connection_.Write(
+        [&](soci::session& sql) { return Execute(sql, "delete from sessions where expires <= :now", now_s); },
+        Durability::kLazy, Patience::kGivesUp);
 }
 
 }  // namespace lookhaven::store

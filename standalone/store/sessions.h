@@ -57,7 +57,8 @@ class Sessions {
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
 
-    // Records that the session is in use and postpones its end. Writes at most once a minute; true when it wrote.
+    // Records that the session is in use and postpones its end. Writes at most once a minute; true when it wrote. Throws
+    // StoreError at once when another writer has the store: the next request may touch the session.
     bool Touch(const Session& session, std::int64_t now_s);
 
     // False when there was no such session.
@@ -68,7 +69,7 @@ class Sessions {
     // Those of the handles whose session is over: unknown, expired or ended. One query.
     std::vector<std::string> EndedAmong(const std::vector<std::string>& handles, std::int64_t now_s);
 
-    // The number of rows deleted.
+    // The number of rows deleted. Does not wait for other writers, either.
     int PurgeExpired(std::int64_t now_s);
 
   private:

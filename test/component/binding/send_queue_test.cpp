@@ -107,16 +107,38 @@ TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFr
         stream->ReadFinish(entry, true, &position);
         return sequence;
     };
+    ring::Writer sound_writer(home, {1, 0, base::Medium::kAudio}, {"AAC", {}, 0, 0, true},
+                              {.index_slots = 64, .arena_bytes = 1 << 16});
+    auto* sound = static_cast<ShmStreamFifo*>(ring::Attach(home, {1, 0, base::Medium::kAudio}));
+    const auto write_sound = [&](std::int64_t age_ms) {
+        const unsigned char byte = 0;
+        ASSERT_TRUE(sound_writer.Write({{&byte, 1}, 0, true, 0, now_ms - age_ms}));
+    };
+    __tag_DATA_ENTRY_INFO sound_position;
+    sound->StartRead(&sound_position);
+    const auto next_sound = [&](int last) {
+        DataEntry* entry = sound->ReadNext(last, &sound_position);
+        const int sequence = entry == nullptr ? -1 : entry->m_SeqNo;
+        sound->ReadFinish(entry, false, &sound_position);
+        return sequence;
+    };
+    for (const std::int64_t age_ms : {5000, 4000, 3000, 1500, 1000}) {
+        write_sound(age_ms);
+    }
     for (const auto& [key, age_ms] : {std::pair{false, 3000}, {true, 2500}, {false, 1500}}) {
         write(key, age_ms);
     }
     EXPECT_EQ(next(0), 1) << "the group that it begins with is sent whatever its age";
+    EXPECT_EQ(next_sound(0), 1) << "nothing has held it back";
     std::array<char, 100'000> block{};
     ASSERT_GT(send(server_.Get(), block.data(), block.size(), MSG_DONTWAIT), 65'536);
     EXPECT_EQ(next(1), -1) << "the connection is not drained";
+    EXPECT_EQ(next_sound(1), -1);
     while (recv(client_.Get(), block.data(), block.size(), MSG_DONTWAIT) > 0) {
     }
     EXPECT_EQ(next(1), -1) << "one that is old, and one that needs it";
+    EXPECT_EQ(next_sound(1), 4) << "the newest";
+    EXPECT_EQ(next_sound(4), -1);
     write(true, 500);
     write(false, 400);
     EXPECT_EQ(next(1), 4);
@@ -124,7 +146,9 @@ TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFr
     EXPECT_EQ(next(5), -1);
     RequestContext::Current().SetQueue(nullptr);
     stream->StopRead(&position);
+    sound->StopRead(&sound_position);
     ring::Detach(stream);
+    ring::Detach(sound);
 }
 
 }  // namespace

@@ -258,7 +258,15 @@ TEST_F(RecordingsTest, ARecordingIsTakenInExportedAndMissedWhenItIsGone) {
     const std::string number = std::to_string(id);
     const auto whole = folder_ / "whole.mkv";
     const auto silent = folder_ / "silent.mkv";
-    Play({{"verify", 1, "verify --repair"}, {"event show " + number, 66, "no event"}, {"verify --repair", 0, "done:"}});
+    store::Mount broken;
+    broken.name = "broken";
+    broken.path = "/" + std::string(300, 'x');  // an error that does not mean that the mount is away
+    broken.id = store::Mounts(store).Add(broken);
+    Play({{"verify", 1, "verify --repair"},
+          {"event show " + number, 66, "no event"},
+          {"verify --repair", 1, "adopted"},
+          {"verify --repair", 1, "was left alone: "}});
+    store::Mounts(store).Remove(broken.id, true);
     {
         maintenance::MountLock other;
         EXPECT_TRUE(other.Hold(home_ / "recordings"));

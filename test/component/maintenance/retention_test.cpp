@@ -7,11 +7,14 @@
 #include <array>
 #include <fstream>
 #include <functional>
+#include <limits>
 
+#include <dlfcn.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sched.h>
 #include <sys/mount.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
@@ -22,6 +25,22 @@
 #include "standalone/store/marks.h"
 #include "test/support/folder.h"
 #include "test/support/footage/footage.h"
+
+namespace {
+
+std::function<void(struct statvfs&)> g_lie;
+
+}  // namespace
+
+// In the place of the C library's: a file system that does not know what it holds.
+extern "C" int fstatvfs(int file, struct statvfs* report) {
+    static const auto real = reinterpret_cast<int (*)(int, struct statvfs*)>(::dlsym(RTLD_NEXT, "fstatvfs"));
+    const int result = real(file, report);
+    if (g_lie) {
+        g_lie(*report);
+    }
+    return result;
+}
 
 namespace lookhaven::maintenance {
 namespace {
@@ -98,15 +117,34 @@ TEST_F(RetentionTest, TheOldestGoWhereNoFileCouldBeMade) {
     const auto space = [&] { return MountFolder::Open(footage_.Mount(), mark)->Space(); };
     EXPECT_EQ(Run(0).events, 0);
     while (space().free_files > 3 * space().ReserveFiles() - 2) {
-        std::ofstream(footage_.Mount() / std::to_string(space().free_files));
+        std::ofstream(footage_.Mount() / ("x" + std::to_string(space().free_files)));
     }
     EXPECT_EQ(Run(0).events, 0) << "between the limits";
-    while (space().free_files > 2 * space().ReserveFiles() - 1) {
-        std::ofstream(footage_.Mount() / std::to_string(space().free_files));
+    while (space().free_files > 0) {
+        std::ofstream(footage_.Mount() / ("x" + std::to_string(space().free_files)));
     }
     EXPECT_EQ(Run(0).events, 2) << "as many as there are";
     EXPECT_THAT(Left(), IsEmpty()) << second;
     ::umount2(mount, MNT_DETACH);
+}
+
+TEST_F(RetentionTest, NothingGoesForAFileSystemThatReportsNonsense) {
+    footage_.Record(1, kNoon, 60);
+    constexpr auto kUnknown = std::numeric_limits<fsfilcnt_t>::max();
+    const std::function<void(struct statvfs&)> lies[] = {
+        [](auto& report) { report.f_files = 1000, report.f_favail = 0; },
+        [](auto& report) { report.f_files = report.f_favail = 0; },
+        [](auto& report) { report.f_files = report.f_favail = kUnknown; },
+        [](auto& report) { report.f_blocks = report.f_bavail = 0; },
+        [](auto& report) { report.f_blocks = report.f_bavail = kUnknown; },
+    };
+    for (const auto& lie : lies) {
+        g_lie = lie;
+        EXPECT_EQ(Run(0).events, 0) << &lie - lies;
+    }
+    g_lie = [](auto& report) { report.f_bavail = 0; };
+    EXPECT_EQ(Run(0).events, 1) << "full";
+    g_lie = {};
 }
 
 TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {

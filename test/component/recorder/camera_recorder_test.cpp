@@ -102,6 +102,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         {"the clock is put right", [&] { wall_ahead_ms_ -= 1'900; }, {10}, -1'900},
         {"the pictures' times go back", [&] { late_us_ = 900'000; }, {3, 7}, -900},
         {"the camera stalls", [&] { Pass(4, false); }, {3, 7}, 4'000},
+        {"the camera hesitates", [&] { Pass(2.6, false); }, {10}},
         {"another mount", [&] { request_.plan.mount_id = 2, request_.plan.mount = MountPath(2); }, {3, 7}},
     };
     std::size_t known = 0;
@@ -123,6 +124,13 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
             const archive::RecordingReader event(files[known++]);
             EXPECT_EQ(test::Probe(files[known - 1]), "h264," + std::to_string(seconds * kFps) + "\n");
             EXPECT_FALSE(event.Grows());
+            const std::string name = files[known - 1].stem().string();
+            const int id = std::stoi(name.substr(name.find('-') + 1));
+            store::Store store = store::Store::Open(StoreUrl());
+            EXPECT_TRUE(test::Eventually(std::chrono::seconds(5), [&] {
+                const auto stored = store::Events(store).Find(id);
+                return stored && !stored->recording && stored->frame_count == event.FrameCount();
+            })) << event.FrameCount();
             EXPECT_NEAR(static_cast<double>(event.StartWallMs() - expected_ms), 40, 1);
             expected_ms += seconds * 1000 + (expected_ms == begin_ms ? row.step_ms : 0);
         }

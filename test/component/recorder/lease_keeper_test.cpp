@@ -31,6 +31,10 @@ TEST(LeaseKeeper, OneRecorderAtATimeHoldsAStore) {
     EXPECT_FALSE(second.Hold(store, 1));
     now_us += LeaseKeeper::kExpiryUs;
     EXPECT_TRUE(second.Hold(store, 1)) << "nobody renews it";
+    first.Release(store);
+    EXPECT_FALSE(first.Hold(store, 1)) << "what it has lost it cannot give back";
+    second.Release(store);
+    EXPECT_TRUE(first.Hold(store, 1)) << "at once";
 }
 
 }  // namespace

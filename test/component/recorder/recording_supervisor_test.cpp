@@ -91,6 +91,7 @@ TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
         << "recovery is tried again";
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
+    EXPECT_EQ(store::RecorderLease(store_).Current().holder, "") << "nobody need wait for it to expire";
 }
 
 }  // namespace

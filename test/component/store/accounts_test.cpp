@@ -212,6 +212,29 @@ TEST_P(AccountTest, SessionsEndByIdlenessAndByAge) {
     }
 }
 
+TEST_P(AccountTest, ALockedStoreHoldsUpNoSession) {
+    const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
+    const std::string secret = sessions_.Create(id, kNow).secret;
+    const std::optional<Session> session = sessions_.FindBySecret(secret, kNow);
+    Connection(StoreAddress::Parse(url_)).Write([&](soci::session& sql) {
+        sql << "update sessions set user_id = user_id";
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_THROW(sessions_.Touch(*session, kNow + 60), StoreError);
+        EXPECT_THROW(sessions_.PurgeExpired(kNow + 31 * 24 * kHour), StoreError);
+        EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
+        EXPECT_TRUE(sessions_.FindBySecret(secret, kNow));
+    });
+    EXPECT_TRUE(sessions_.Touch(*session, kNow + 60));
+    store_.connection().Read([&](soci::session& sql) {
+        const bool is_sqlite = GetParam() == Engine::kSqlite;
+        std::string patience;
+        std::string durability;
+        sql << (is_sqlite ? "pragma busy_timeout" : "show lock_timeout"), soci::into(patience);
+        sql << (is_sqlite ? "pragma synchronous" : "show synchronous_commit"), soci::into(durability);
+        EXPECT_EQ(patience + durability, is_sqlite ? "50002" : "0on") << "as before for other changes";
+    });
+}
+
 TEST_P(AccountTest, GuessingIsSlowedDownPerAccountAndAddress) {
     LoginThrottle throttle(store_);
     const struct {

@@ -95,7 +95,7 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
     std::vector<Event> all(400);
     std::ranges::generate(all, [this] { return RandomEvent(); });
     events_.AddAll(all);
-    std::ranges::for_each(all, [id = 1](Event& event) mutable { event.id = id++; });
+    std::ranges::for_each(all, [id = 1](Event& event) mutable { event.order = event.id = id++; });
     int found = 0;
     for (int i = 0; i < 300; ++i) {
         auto filter = RandomSpan<EventFilter>(kDay);
@@ -140,7 +140,7 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         EXPECT_EQ(visited, rows) << mount;
         std::erase_if(rows, [](const Event& event) { return event.recording || event.archived; });
         std::ranges::sort(rows, {}, &Event::id);
-        EXPECT_EQ(events_.InRecordingOrder(mount, 0, 1000), rows) << mount;
+        EXPECT_EQ(events_.InRecordingOrder(mount, {}, 1000), rows) << mount;
     }
     const auto demo = std::ranges::count_if(all, &Event::demo);
     EXPECT_EQ(events_.RemoveDemo(), demo);
@@ -156,7 +156,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     events_.Begin(event);
     EXPECT_THROW(events_.Begin(event), AlreadyExists);
     EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
-    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, 0, 1), IsEmpty()) << "retention leaves an open one alone";
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty()) << "retention leaves an open one alone";
     events_.BeginDeletion(std::array{event.id});
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), IsEmpty());
     EXPECT_TRUE(events_.Grow(event.id, event.start_s + 1, 25, 5'000'000'000));
@@ -172,16 +172,16 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THROW(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds + 1, 25, 1), InvalidRecord);
     EXPECT_TRUE(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds, 50, 6));
     EXPECT_THAT(events_.Open(), IsEmpty());
-    EXPECT_THAT(Ids(events_.InRecordingOrder(event.mount_id, 0, 1)), ElementsAre(event.id));
-    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, event.id, 1), IsEmpty());
+    EXPECT_THAT(Ids(events_.InRecordingOrder(event.mount_id, {}, 1)), ElementsAre(event.id));
     const Event finished = *events_.Find(event.id);
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, finished, 1), IsEmpty());
     events_.BeginDeletion(std::array{event.id});
     EXPECT_FALSE(events_.Find(event.id) || events_.Content(event.mount_id).events > 0);
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), ElementsAre(finished));
     events_.CancelDeletion(std::array{event.id});
     EXPECT_EQ(events_.Find(event.id), finished);
     EXPECT_TRUE(events_.SetArchived(event.id, true));
-    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, 0, 1), IsEmpty());
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty());
     const int unknown = events_.NextId();
     EXPECT_GT(unknown, event.id);
     EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1) ||
