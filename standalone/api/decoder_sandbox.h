@@ -24,7 +24,4 @@ std::vector<sock_filter> PlaybackFilter();
 void EnterPlaybackSandbox(const std::vector<sock_filter>& playback_filter);
 void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own);
 
-// For good. Where the kernel has no filters it is logged, and the process keeps its calls. Throws std::system_error.
-void EnterDecoderSandbox(const std::vector<sock_filter>& filter);
-
 }  // namespace lookhaven::api

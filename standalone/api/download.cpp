@@ -10,6 +10,7 @@
 
 #include <unistd.h>
 
+#include "standalone/api/decoder_sandbox.h"
 #include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
@@ -90,8 +91,11 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     if (archive::RecordingReader(path).FrameCount() == 0) {
         throw Failure(404, "nothing of the event is recorded yet");
     }
+    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    call.slots.KeepOnly(call.slot);
+    EnterPlaybackSandbox(PlaybackFilter());  // the copier reads what a camera has sent
     try {
-        media::LoadRemuxLibrary().Copy(path, STDOUT_FILENO, options);
+        remux.Copy(path, STDOUT_FILENO, options);
     } catch (const std::system_error& error) {
         if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
             throw;
