@@ -261,11 +261,11 @@ RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mou
     RetentionForecast forecast;
     const std::int64_t excess_bytes = mount.max_bytes > 0 ? events.Content(mount.id).size_bytes - mount.max_bytes : 0;
     const std::int64_t keep_from_s = mount.max_age_s > 0 ? now_s - mount.max_age_s : 0;
-    int after = 0;
+    store::Event after;
     for (;;) {
         const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsAtOnce);
         for (const store::Event& event : oldest) {
-            after = event.id;
+            after = event;
             if (forecast.bytes >= excess_bytes && event.end_s > keep_from_s) {
                 return forecast;
             }
