@@ -2,8 +2,9 @@
 //
 // Simulates any number of cameras: H.264 with AAC by RTSP, and Motion JPEG by HTTP, 25 frames a second from memory.
 //
-// Arguments: an Annex B file with access unit delimiters, an ADTS file of 48 kHz, a JPEG file. Prints both ports, RTSP's
-// first. Each connection is a camera of its own, whatever path it asks for; their frames are spread over the frame's time.
+// Arguments: an Annex B file with access unit delimiters, an ADTS file of 48 kHz, a JPEG file. Prints both ports,
+// RTSP's first. Each connection is a camera of its own, whatever path it asks for; their frames are spread over the
+// frame's time.
 #include <algorithm>
 #include <array>
 #include <cerrno>

@@ -14,8 +14,8 @@ class LH_PLATFORM_API SDKUser {
                                const std::string& remoteIp);
 };
 
-// True when cookie is the right answer to timestamp under the secret that this host shares with a paired host. The module
-// passes non-empty placeholders for missing values, which must not match.
+// True when cookie is the right answer to timestamp under the secret that this host shares with a paired host. The
+// module passes non-empty placeholders for missing values, which must not match.
 LH_PLATFORM_API bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp);
 
 // Pair matching on a recording server, for cross-site requests from its managing host.

@@ -54,8 +54,8 @@ class LH_PLATFORM_API ShmStreamFifo {
     // The entry after lastSeq, or null when that is the newest; the newest key frame, or the newest audio entry, when
     // lastSeq has been overwritten or names no entry. Of video it may wait up to 100 ms while neither it nor the audio
     // ring that is read beside it holds anything unread; a signal ends the wait. Of video it is null, too, while the
-    // client's connection has not drained; and where that made the stream more than two seconds late, it skips to the first
-    // key frame that is not.
+    // client's connection has not drained; and where that made the stream more than two seconds late, it skips to the
+    // first key frame that is not.
     DataEntry* ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position);
     // The newest key frame, or null.
     DataEntry* ReadLatestIFrame();

@@ -10,8 +10,8 @@
 
 namespace lookhaven::api {
 
-// The name of the cookie that carries the session's secret. Over HTTPS it is one that a browser takes from this very host
-// alone, never from another that shares its domain, nor over plain HTTP.
+// The name of the cookie that carries the session's secret. Over HTTPS it is one that a browser takes from this very
+// host alone, never from another that shares its domain, nor over plain HTTP.
 const char* SessionCookie(const http::Request& request);
 
 // The live session of the call's cookie, noted as in use; nothing when there is none. Looks at query and headers only.

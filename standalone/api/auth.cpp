@@ -71,8 +71,8 @@ void RefuseUnlessNow(int wait_s) {
     }
 }
 
-// Throws Failure for who may not log in, or not now. An attempt for which there is no room does not count as one, and one
-// that is barred takes no room.
+// Throws Failure for who may not log in, or not now. An attempt for which there is no room does not count as one, and
+// one that is barred takes no room.
 store::VerifiedUser CheckPassword(const Call& call, const std::string& account) {
     const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
     store::LoginThrottle throttle(call.Records());

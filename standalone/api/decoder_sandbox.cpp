@@ -69,7 +69,8 @@ std::vector<sock_filter> StillPictureFilter() {
 
 }  // namespace
 
-// Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not named.
+// Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not
+// named.
 std::vector<sock_filter> PlaybackFilter() {
     SystemCallFilter filter(SystemCallFilter::DefaultAction::kAllow);
     // Programs and processes. Threads are made by clone, since a filter cannot read what clone3 is told.

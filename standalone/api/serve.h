@@ -22,8 +22,8 @@ struct Service {
     std::vector<sock_filter> playback_filter;  // PlaybackFilter(), made once for all
 };
 
-// Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down for
-// writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.
+// Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down
+// for writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.
 void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot);
 
 }  // namespace lookhaven::api

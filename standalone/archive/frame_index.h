@@ -33,7 +33,8 @@ struct IndexHeader {
     bool operator==(const IndexHeader&) const = default;
 };
 
-// Whether it can be a recording's: codecs that are known, a size and a start that are possible. A reader refuses others.
+// Whether it can be a recording's: codecs that are known, a size and a start that are possible. A reader refuses
+// others.
 bool IsPossible(const IndexHeader& header);
 
 // Readers take a frame with a later time for damage.

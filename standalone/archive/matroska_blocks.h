@@ -31,8 +31,8 @@ class MatroskaBlocks {
     // std::system_error.
     bool ReadCluster(std::vector<FrameEntry>& frames);
 
-    // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none, or
-    // after a thousand attempts for the whole file. Throws std::system_error.
+    // After damage: moves to the next cluster that ReadCluster can read. False, without a change, when there is none,
+    // or after a thousand attempts for the whole file. Throws std::system_error.
     bool SkipDamage();
 
     // Where the last complete cluster ends, or what precedes the first.

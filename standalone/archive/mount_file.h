@@ -2,10 +2,10 @@
 //
 // Opens, writes and removes the files of a mount without leaving it.
 //
-// Why so        Others may be allowed to write to a disk of recordings. A symbolic link that they put there must not make
-//               us read or overwrite a file elsewhere, and a pipe must not block us. The mount itself may be reached through
-//               a link. Its folders are opened one after the other without following links, rather than by openat2, which
-//               older kernels and the system call filters of many containers lack.
+// Why so        Others may be allowed to write to a disk of recordings. A symbolic link that they put there must not
+//               make us read or overwrite a file elsewhere, and a pipe must not block us. The mount itself may be
+//               reached through a link. Its folders are opened one after the other without following links, rather than
+//               by openat2, which older kernels and the system call filters of many containers lack.
 #pragma once
 
 #include <cstddef>

@@ -19,9 +19,9 @@ struct Contents {
 };
 
 // Truncates the recording after its last complete cluster and makes its index list exactly what is there; a missing or
-// damaged index is rebuilt, around clusters that are damaged. Does nothing to a recording that is finished and intact. frame_count is 0 when nothing can
-// be saved; then the files are unchanged, and the caller may remove them. Throws std::system_error, EBUSY while the
-// recording is still being written.
+// damaged index is rebuilt, around clusters that are damaged. Does nothing to a recording that is finished and intact.
+// frame_count is 0 when nothing can be saved; then the files are unchanged, and the caller may remove them. Throws
+// std::system_error, EBUSY while the recording is still being written.
 Contents CloseCrashed(const std::filesystem::path& recording);
 
 }  // namespace lookhaven::archive

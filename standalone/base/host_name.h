@@ -7,8 +7,8 @@
 
 namespace lookhaven::base {
 
-// A host name of RFC 1123 (an underscore may stand in it too), an IPv4 address in four numbers, or an IPv6 address without
-// brackets and zone. Says nothing of whether there is such a host.
+// A host name of RFC 1123 (an underscore may stand in it too), an IPv4 address in four numbers, or an IPv6 address
+// without brackets and zone. Says nothing of whether there is such a host.
 bool IsHost(std::string_view text);
 
 // "host", "host:8080", "[2001:db8::1]:8080": a host, and a port from 1 to 65535 where one is given.

@@ -7,8 +7,8 @@
 
 namespace lookhaven::base {
 
-// The folder named by LOOKHAVEN_HOME, else the one that the programs were built for: "var" in the checkout. Never one that
-// depends on the working folder.
+// The folder named by LOOKHAVEN_HOME, else the one that the programs were built for: "var" in the checkout. Never one
+// that depends on the working folder.
 std::filesystem::path DefaultHome();
 
 // Whether lookhaven init or the first start has left its files in the folder. Any other is not ours to change.

@@ -2,8 +2,8 @@
 //
 // Takes system calls away from a process: all but those that are named, or those that are named.
 //
-// Why so        A refused call fails with ENOSYS, as on an old kernel, so that the C library takes another way where it knows
-//               one. libseccomp knows the calls' numbers on each architecture, and leaves out what one lacks.
+// Why so        A refused call fails with ENOSYS, as on an old kernel, so that the C library takes another way where it
+//               knows one. libseccomp knows the calls' numbers on each architecture, and leaves out what one lacks.
 #pragma once
 
 #include <initializer_list>
@@ -35,8 +35,8 @@ class SystemCallFilter {
 
     // Without exceptions, all calls are refused, or allowed. These throw std::system_error or std::bad_alloc.
     explicit SystemCallFilter(DefaultAction action);
-    // The calls, which SCMP_SYS names, are an exception from that; with conditions, when all of them hold. A call may be
-    // named several times.
+    // The calls, which SCMP_SYS names, are an exception from that; with conditions, when all of them hold. A call may
+    // be named several times.
     void AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions = {});
 
     // For InstallSystemCallFilter, in any number of processes.

@@ -14,8 +14,8 @@
 
 namespace lookhaven::binding {
 
-// Takes what the library takes; text that is not UTF-8, and numbers that JSON lacks, come out as from the library. Throws
-// std::bad_alloc alone, and has appended a part of the value then.
+// Takes what the library takes; text that is not UTF-8, and numbers that JSON lacks, come out as from the library.
+// Throws std::bad_alloc alone, and has appended a part of the value then.
 LH_PLATFORM_API void AppendCompactJson(std::string& text, const Json::Value& value);
 
 }  // namespace lookhaven::binding

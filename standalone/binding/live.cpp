@@ -80,8 +80,8 @@ bool TakeOverdueTurn() {
     return queue != nullptr && queue->TakeOverdueTurn();
 }
 
-// Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's longest
-// wait; nothing when neither came about, or a signal came.
+// Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's
+// longest wait; nothing when neither came about, or a signal came.
 std::optional<int> AwaitDrained() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = MonotonicMicros() + ring::kMaxWaitMillis * 1000;
@@ -105,8 +105,8 @@ struct Lag {
     bool is_sound_held_back = false;
 } g_lag;
 
-// Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that is not. The group
-// that a stream begins with is sent whatever its age.
+// Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that
+// is not. The group that a stream begins with is sent whatever its age.
 bool IsSkipped(const ring::Entry& entry) {
     const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
     const bool is_behind = IsBehind(entry);

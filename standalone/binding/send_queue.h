@@ -3,10 +3,10 @@
 // Tells whether what was sent to a viewer is still on its way.
 //
 // Why so        Socket buffers and the web server hold hundreds of kilobytes. On a line of 50 kB/s a picture that waits
-//               behind them arrives ten seconds old. So a live stream lets a slow connection drain, and only then takes its next
-//               picture, the newest. The kernel knows how long the queues are: that to the web server, and that of the web
-//               server's TCP connection to the viewer, of which anybody may ask (sock_diag). While the latter has room,
-//               the web server holds nothing back.
+//               behind them arrives ten seconds old. So a live stream lets a slow connection drain, and only then takes
+//               its next picture, the newest. The kernel knows how long the queues are: that to the web server, and
+//               that of the web server's TCP connection to the viewer, of which anybody may ask (sock_diag). While the
+//               latter has room, the web server holds nothing back.
 // Thread safety One thread.
 #pragma once
 
@@ -35,8 +35,8 @@ class LH_PLATFORM_API SendQueue {
 
     // Whether what is sent now arrives soon: little waits, or no more than the viewer has lately taken within 100 ms.
     bool IsDrained();
-    // It has not been drained for ten seconds: the slowest viewer gets a picture now and then. Once true, the ten seconds
-    // begin anew: ask only where there is a picture to send.
+    // It has not been drained for ten seconds: the slowest viewer gets a picture now and then. Once true, the ten
+    // seconds begin anew: ask only where there is a picture to send.
     bool TakeOverdueTurn();
 
   private:

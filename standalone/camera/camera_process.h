@@ -16,8 +16,8 @@ constexpr int kSocketOfProcess = 3;
 
 class CameraProcess {
   public:
-    // Starts the program, which lies beside the calling one, with nothing but the socket: no other descriptor, no environment.
-    // It dies with the calling thread. Throws media::SourceError.
+    // Starts the program, which lies beside the calling one, with nothing but the socket: no other descriptor, no
+    // environment. It dies with the calling thread. Throws media::SourceError.
     CameraProcess();
     CameraProcess(const CameraProcess&) = delete;
     CameraProcess& operator=(const CameraProcess&) = delete;

@@ -7,8 +7,8 @@
 
 namespace lookhaven::camera {
 
-// Applies to the calling thread and what it starts, for good. False when this kernel, or what emulates it, has no filters. Throws
-// std::system_error.
+// Applies to the calling thread and what it starts, for good. False when this kernel, or what emulates it, has no
+// filters. Throws std::system_error.
 bool FilterSystemCalls();
 
 }  // namespace lookhaven::camera

@@ -23,7 +23,8 @@ namespace lookhaven::camera {
 
 namespace {
 
-// What the C library reads to resolve a name, and what the TLS library reads at its start; a camera's certificate is not verified.
+// What the C library reads to resolve a name, and what the TLS library reads at its start; a camera's certificate is
+// not verified.
 constexpr const char* kReadable[] = {
     "/etc/gai.conf",
     "/etc/host.conf",

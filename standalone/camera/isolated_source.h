@@ -10,8 +10,8 @@
 
 namespace lookhaven::camera {
 
-// A media::SourceOpener. The source belongs to the thread that opens it, which must not end before: its process ends with
-// either of them. A stop request ends any wait at once, also for the resolution of a host name.
+// A media::SourceOpener. The source belongs to the thread that opens it, which must not end before: its process ends
+// with either of them. A stop request ends any wait at once, also for the resolution of a host name.
 std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media::SourceOptions& options,
                                             std::stop_token stop);
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven-camera: reads one camera for the recorder, confined; see docs/design/cameras.md. Not for users: it expects a
-// socket as descriptor 3.
+// lookhaven-camera: reads one camera for the recorder, confined; see docs/design/cameras.md. Not for users: it expects
+// a socket as descriptor 3.
 #include <csignal>
 #include <cstring>
 #include <exception>

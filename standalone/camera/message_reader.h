@@ -25,8 +25,8 @@ class MessageReader {
 
     explicit MessageReader(Input input);
 
-    // These are called once each, in this order, before Next. They throw SourceError with the process's own reason when it
-    // reports a failure, SourceError for a malformed message, and whatever the input throws.
+    // These are called once each, in this order, before Next. They throw SourceError with the process's own reason when
+    // it reports a failure, SourceError for a malformed message, and whatever the input throws.
 
     // Waits until the process has confined itself; returns the kLacks flags of what this kernel cannot do.
     std::uint8_t ReadConfined();

@@ -3,7 +3,8 @@
 // What the recorder and a camera's process say to each other over their socket.
 //
 //   recorder        one request: the length of its body, then the body
-//   camera process  kConfined, perhaps kFormat of its sound, kOpened; then kFormat of its picture before its first frame
+//   camera process  kConfined, perhaps kFormat of its sound, kOpened; then kFormat of its picture before its first
+//   frame
 //                   and whenever it changes, and frames; kFailure instead of any of them ends it
 //
 // Both run on one machine and come from one build, so numbers are in the machine's own byte order.

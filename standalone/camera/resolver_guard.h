@@ -2,9 +2,9 @@
 //
 // The one host that lookhaven-camera looks up.
 //
-// Why so        A camera may redirect its reader, over HTTP and RTSP alike, and libav follows: to any address of the network,
-//               and to this machine's own. Whether a name or a number, libav looks it up first. So this program has a
-//               getaddrinfo of its own, in front of the C library's.
+// Why so        A camera may redirect its reader, over HTTP and RTSP alike, and libav follows: to any address of the
+//               network, and to this machine's own. Whether a name or a number, libav looks it up first. So this
+//               program has a getaddrinfo of its own, in front of the C library's.
 #pragma once
 
 #include <string>

@@ -19,8 +19,8 @@ class CameraStates {
     // Reads them. Throws std::system_error.
     explicit CameraStates(const base::Installation& installation);
 
-    // Adds the member "state" to a camera that has "id" and "enabled": what the recorder says; "disabled"; "idle", where
-    // nobody asks for its picture; "unknown", while no recorder runs. And "no_signal" while no picture comes.
+    // Adds the member "state" to a camera that has "id" and "enabled": what the recorder says; "disabled"; "idle",
+    // where nobody asks for its picture; "unknown", while no recorder runs. And "no_signal" while no picture comes.
     void AddTo(Json::Value& camera) const;
 
   private:

@@ -65,8 +65,8 @@ class Console {
     bool json = false;
 
     std::string HomePath() const;
-    // Root becomes the owner of the state folder for good, so that it leaves no files there that the server, which runs as
-    // that user, could not use. Does nothing where there is no folder yet. Throws Failure.
+    // Root becomes the owner of the state folder for good, so that it leaves no files there that the server, which runs
+    // as that user, could not use. Does nothing where there is no folder yet. Throws Failure.
     void BecomeOwner() const;
     // BecomeOwner first. Throws Failure when there is no folder, or one of something else.
     base::Installation Installation() const;

@@ -13,7 +13,8 @@ namespace lookhaven::cli {
 // footage; not with take_over. mount_id: 0 for a new mount.
 void RequireFreeFolder(store::Store& store, const std::string& path, int mount_id, bool take_over);
 
-// Marks the folder as that of the mount. Keeps later cameras and events from getting the numbers of footage that is there.
+// Marks the folder as that of the mount. Keeps later cameras and events from getting the numbers of footage that is
+// there.
 void ClaimFolder(store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::cli

@@ -41,8 +41,8 @@ class MappedTable {
         return table;
     }
 
-    // Nothing when the file cannot be opened, is a link, or is not of a T's size. Of a const T the mapping is read-only.
-    // Throws std::system_error when mapping fails.
+    // Nothing when the file cannot be opened, is a link, or is not of a T's size. Of a const T the mapping is
+    // read-only. Throws std::system_error when mapping fails.
     static std::optional<MappedTable> Open(const std::filesystem::path& path) {
         constexpr bool kReadOnly = std::is_const_v<T>;
         constexpr int kFlags = O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | (kReadOnly ? O_RDONLY : O_RDWR);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One number that a player shares with its client's other requests: a small mapped file for each session and stream key.
+// One number that a player shares with its client's other requests: a small mapped file for each session and stream
+// key.
 //
 // Why so        Both sides may be killed at any point, and the host sweeps what they leave while a new player takes the
 //               same key. So nobody locks: the file holds its owner's process id, which changes by compare and swap.
@@ -24,8 +25,8 @@ class ProgressFile {
   public:
     static constexpr int kUnset = -1;
 
-    // Makes the calling process the owner of the session's key, with no number set; creates the folder if it is missing.
-    // session: its handle, here and below. Nothing when others take and leave the key all the time. Throws
+    // Makes the calling process the owner of the session's key, with no number set; creates the folder if it is
+    // missing. session: its handle, here and below. Nothing when others take and leave the key all the time. Throws
     // std::system_error.
     static std::optional<ProgressFile> Own(const std::filesystem::path& folder, std::int64_t key,
                                            std::string_view session);

@@ -12,8 +12,8 @@
 //                   never reaches a later one in the same slot.
 //               (5) What a request occupies is noted in its slot alone, so it is given back when the process ends,
 //                   however it ends.
-//               (6) Each slot has pages of its own, so that a process can give up all others (KeepOnly). Which slots are
-//                   taken the host keeps in memory of its own.
+//               (6) Each slot has pages of its own, so that a process can give up all others (KeepOnly). Which slots
+//                   are taken the host keeps in memory of its own.
 // Thread safety Any process. The host never waits for the mutex.
 #pragma once
 
@@ -146,8 +146,8 @@ class SlotTable {
     // The same without waking the host, for the host.
     static void MarkEnded(const RequestRef& use);
 
-    // For a request process that is about to decode: no other slot can be reached from it any more, nor the host be woken.
-    // Only what takes a slot alone may be called then.
+    // For a request process that is about to decode: no other slot can be reached from it any more, nor the host be
+    // woken. Only what takes a slot alone may be called then.
     void KeepOnly(const Slot& slot);
 
     // Readable after Wake, until ClearWake.

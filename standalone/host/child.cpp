@@ -20,8 +20,8 @@ namespace {
 
 constexpr int kWakeDescriptor = 3;
 
-// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range; there may be
-// a thousand million numbers to try then, so it looks which are open.
+// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range; there may
+// be a thousand million numbers to try then, so it looks which are open.
 void CloseFrom(int first) {
     if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
         return;

@@ -17,8 +17,8 @@ namespace lookhaven::host {
 // Makes descriptors 0, 1 and 2 exist, so that no other file ever gets these numbers.
 void OpenStandardDescriptors();
 
-// A socket file of its own is open to user and group, replaces one that nobody listens on, and is removed when the socket
-// is closed, unless a successor has replaced it.
+// A socket file of its own is open to user and group, replaces one that nobody listens on, and is removed when the
+// socket is closed, unless a successor has replaced it.
 class Listener {
   public:
     // Takes descriptor 3 when LISTEN_PID and LISTEN_FDS say that it was handed over, else listens on the path. Throws

@@ -23,7 +23,8 @@ namespace lookhaven::host {
 namespace {
 
 constexpr std::chrono::milliseconds kPendingSignal{5};
-// A client that seeks closes one stream and opens the next; the end of the one may be seen after the start of the other.
+// A client that seeks closes one stream and opens the next; the end of the one may be seen after the start of the
+// other.
 constexpr std::chrono::milliseconds kSeek{50};
 
 void Signal(const base::FileDescriptor& pidfd, int number) {

@@ -32,8 +32,8 @@ struct ServerLimits {
 
 class Server {
   public:
-    // Borrows the listener, and closes it when it stops to serve. Removes what players of a killed host left in the installation's
-    // folder of progress files. Blocks all signals of the process. Throws std::system_error.
+    // Borrows the listener, and closes it when it stops to serve. Removes what players of a killed host left in the
+    // installation's folder of progress files. Blocks all signals of the process. Throws std::system_error.
     Server(const base::Installation& installation, ChildWork work, Listener& listener, const ServerLimits& limits);
 
     // Serves until SIGTERM or SIGINT, then ends the request processes and returns when the last is gone.

@@ -15,7 +15,8 @@ namespace lookhaven::http {
 void ReadBody(Request& request, int connection);
 
 // Drops the rest of a body that was not read, for a second at most: a connection that is closed with unread bytes is
-// reset, and the client might lose the answer. Call it when the answer is sent and the connection shut down for writing.
+// reset, and the client might lose the answer. Call it when the answer is sent and the connection shut down for
+// writing.
 void DropBody(const Request& request, int connection);
 
 }  // namespace lookhaven::http

@@ -21,8 +21,8 @@ struct Inspection {
     std::int64_t shown_frames = 0;  // as players count them; when there is no problem
 };
 
-// Reads all of the file but its frames. A file that cannot be used is a problem, not a failure; throws std::system_error
-// when the disk fails.
+// Reads all of the file but its frames. A file that cannot be used is a problem, not a failure; throws
+// std::system_error when the disk fails.
 Inspection Inspect(const std::filesystem::path& recording);
 
 // Whether it says something of the disk rather than of one file on it.

@@ -56,15 +56,15 @@ class MountFolder {
     // Nothing when there is none, or what is there is no marker. Throws std::system_error when that cannot be told.
     static std::optional<MountMarker> ReadMarker(const std::filesystem::path& folder);
 
-    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted. Throws std::system_error
-    // when that cannot be told.
+    // Nothing when the folder is missing or lacks that mount's marker: the disk is not mounted. Throws
+    // std::system_error when that cannot be told.
     static std::optional<MountFolder> Open(const std::filesystem::path& folder, const MountMarker& marker);
 
     const std::filesystem::path& Path() const { return path_; }
     // Throws std::system_error.
     MountSpace Space() const;
-    // Whether the file system has room for one more file, as making one shows. Throws std::system_error when neither can
-    // be told.
+    // Whether the file system has room for one more file, as making one shows. Throws std::system_error when neither
+    // can be told.
     bool TakesAnotherFile() const;
 
     // Whether anything of the camera was recorded on that UTC day.

@@ -29,7 +29,8 @@ bool MountLock::Hold(const std::filesystem::path& folder) {
     if (marker_ && IsSameFile(marker_.Get(), marker.Get())) {
         return true;
     }
-    // Whoever can read the marker can lock it, too. Of another owner's file, and on a file system without modes, it stays so.
+    // Whoever can read the marker can lock it, too. Of another owner's file, and on a file system without modes, it
+    // stays so.
     ::fchmod(marker.Get(), 0600);
     if (::flock(marker.Get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK) {
         return false;

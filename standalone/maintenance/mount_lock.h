@@ -2,8 +2,9 @@
 //
 // Makes sure that only one recorder works on a mount.
 //
-// Why so        A copy of a state folder has the same id as the original, so the marker cannot tell their recorders apart.
-//               Each would remove what the other has recorded. The lock is on the marker and ends with the process.
+// Why so        A copy of a state folder has the same id as the original, so the marker cannot tell their recorders
+//               apart. Each would remove what the other has recorded. The lock is on the marker and ends with the
+//               process.
 #pragma once
 
 #include <filesystem>
@@ -14,8 +15,8 @@ namespace lookhaven::maintenance {
 
 class MountLock {
   public:
-    // Takes or keeps the lock of a mount that is there, until Release or destruction. False while another process has it;
-    // true where the file system knows no locks. Throws std::system_error.
+    // Takes or keeps the lock of a mount that is there, until Release or destruction. False while another process has
+    // it; true where the file system knows no locks. Throws std::system_error.
     bool Hold(const std::filesystem::path& folder);
     void Release() { marker_.Reset(); }
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reports the state of each mount's maintenance to the operator: the file "mounts" in the run folder, one line per mount,
-// replaced as a whole when something changes:
+// Reports the state of each mount's maintenance to the operator: the file "mounts" in the run folder, one line per
+// mount, replaced as a whole when something changes:
 //
 //   2 failing cannot remove /srv/cameras/3/2026-03-01/081530-12.mkv: Read-only file system
 //   <mount> <state> <reason, or nothing>

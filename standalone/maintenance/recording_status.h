@@ -1,14 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reports to the operator the state of each camera that is recorded or watched: the file "recordings" in the run folder.
+// Reports to the operator the state of each camera that is recorded or watched: the file "recordings" in the run
+// folder.
 //
 // Why so        The report must reach the operator while the store is unavailable, too. One line per camera; the file
 //               is replaced as a whole when something changes:
 //
 //                 12 recording 4711 0 0 other Entrance
 //                 13 no-signal 0 0 1772352930 refused Gate<tab>cannot open: Connection refused
-//                 <camera> <state> <event or 0> <frames dropped since the recorder started> <since when no picture comes,
-//                 UTC seconds, or 0> <why> <camera's name><tab><why, in a sentence>
+//                 <camera> <state> <event or 0> <frames dropped since the recorder started> <since when no picture
+//                 comes, UTC seconds, or 0> <why> <camera's name><tab><why, in a sentence>
 #pragma once
 
 #include <cstdint>

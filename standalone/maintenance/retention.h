@@ -3,8 +3,9 @@
 // Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
 //
 // Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
-//               (2) The row becomes pending deletion, where no search finds it, the file is removed, then the row. A file that
-//                   cannot be removed gets its row back; what a crash leaves in between is finished by the next pass.
+//               (2) The row becomes pending deletion, where no search finds it, the file is removed, then the row. A
+//                   file that cannot be removed gets its row back; what a crash leaves in between is finished by the
+//                   next pass.
 //               (3) Archived and growing events and those on unmounted mounts are kept.
 //               (4) A mark is removed with the last of its footage.
 //               (5) The oldest is what was recorded first, not what has the earliest date: clocks have been wrong.
@@ -29,10 +30,10 @@ struct RetentionResult {
 enum class AgeLimit { kApplies, kWaits };  // waits while the clock cannot be trusted
 
 // Deletes events, the oldest first: those older than the mount's age limit, and as many as exceed its size limit or as
-// are needed to have three times the disk's reserve free once less than twice the reserve is. An event is kept while one
-// recorded before it is not old enough. The result is empty for a mount that is not mounted. Throws store::StoreError;
-// std::system_error for trouble with this mount, which says nothing about others: handle each mount by itself, and try
-// again later. The events deleted until then stay deleted.
+// are needed to have three times the disk's reserve free once less than twice the reserve is. An event is kept while
+// one recorded before it is not old enough. The result is empty for a mount that is not mounted. Throws
+// store::StoreError; std::system_error for trouble with this mount, which says nothing about others: handle each mount
+// by itself, and try again later. The events deleted until then stay deleted.
 RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
                                  AgeLimit age_limit);
 

@@ -25,9 +25,9 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
 
 // Gives a recording without a row one, or removes a file that never got as far as its first frame. new_id: from
 // Events::NextId, after the file was seen. The recording keeps its own id unless that is higher, so that the store may
-// still give it out, or another event has it: a store that was restored from a backup gives out ids anew. Else it gets the
-// new one, and the place in the order of recording that its date says. A file that is no recording of ours is left alone,
-// which the sentence says. Throws as CloseEvent.
+// still give it out, or another event has it: a store that was restored from a backup gives out ids anew. Else it gets
+// the new one, and the place in the order of recording that its date says. A file that is no recording of ours is left
+// alone, which the sentence says. Throws as CloseEvent.
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
                            int new_id);
 

@@ -227,9 +227,9 @@ class Verification {
 
     int NewId() { return repair_ ? events_.NextId() : std::numeric_limits<int>::max(); }
 
-    // While the store is out of a recorder's reach, the rows of its finished files wait in its memory; their ids are among
-    // those that were given out to it. new_id was given out after the file was seen and before the lease is read, so a
-    // recorder that takes the lease after this has higher ids.
+    // While the store is out of a recorder's reach, the rows of its finished files wait in its memory; their ids are
+    // among those that were given out to it. new_id was given out after the file was seen and before the lease is read,
+    // so a recorder that takes the lease after this has higher ids.
     bool IsReserved(int id, int new_id) {
         const store::LeaseState lease = store::RecorderLease(store_).Current();
         return !lease.holder.empty() && id >= lease.first_reserved_id && id < new_id;

@@ -12,8 +12,8 @@
 namespace lookhaven::media {
 
 // A decoder that refuses pictures above base::kMaxSidePixels. With one thread it works in the caller's own; threads
-// that it starts take no signals. Of Motion JPEG it decodes pictures whose sides are halved as often as asked for, three
-// times at most. Throws SourceError.
+// that it starts take no signals. Of Motion JPEG it decodes pictures whose sides are halved as often as asked for,
+// three times at most. Throws SourceError.
 AvPtr<AVCodecContext> OpenVideoDecoder(Codec codec, int threads = 1, int halvings = 0);
 
 // codec: kH264 or kH265. Throws SourceError.

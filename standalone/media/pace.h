@@ -13,9 +13,9 @@ namespace lookhaven::media {
 bool SleepUntil(std::int64_t due_us, const std::stop_token& stop);
 
 // Maps a source's own time to ours: the first frame counts as captured when it arrives, the others keep the source's
-// distances. When the result is more than a second from the arrival, because the source's clock drifts, the mapping starts
-// again from the arrival of the next key frame, where a recording can begin anew; when it is more than five seconds from
-// it, because that clock jumped, from this arrival. Times go back at a key frame only.
+// distances. When the result is more than a second from the arrival, because the source's clock drifts, the mapping
+// starts again from the arrival of the next key frame, where a recording can begin anew; when it is more than five
+// seconds from it, because that clock jumped, from this arrival. Times go back at a key frame only.
 class Timeline {
   public:
     std::int64_t Map(std::int64_t source_us, std::int64_t arrival_us, bool key_frame = false);

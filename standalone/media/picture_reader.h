@@ -26,7 +26,8 @@ class PictureReader {
     explicit PictureReader(const archive::RecordingReader& recording) : recording_(recording) {}
 
     // Stores the picture of a valid index in the buffer and returns its size. One of Motion JPEG that does not fit is
-    // encoded again, with shorter sides where needed. Throws SourceError when it cannot be decoded or does not fit, archive::ArchiveError, std::system_error.
+    // encoded again, with shorter sides where needed. Throws SourceError when it cannot be decoded or does not fit,
+    // archive::ArchiveError, std::system_error.
     std::size_t Read(int index, std::span<std::uint8_t> buffer);
 
   private:

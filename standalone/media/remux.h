@@ -16,8 +16,8 @@ struct ExportOptions {
     // before begin_ms.
     std::optional<std::int64_t> begin_ms;
     std::optional<std::int64_t> end_ms;
-    // For a receiver that must see whether the copy is whole: called before the first byte, once all is checked that can
-    // be, with the number of bytes that the whole copy will have. A void element fills it up to that number.
+    // For a receiver that must see whether the copy is whole: called before the first byte, once all is checked that
+    // can be, with the number of bytes that the whole copy will have. A void element fills it up to that number.
     std::function<void(std::int64_t size_bytes)> announce = {};
 };
 

@@ -14,7 +14,8 @@ namespace {
 
 // With segments of five minutes, recording goes on for twenty minutes without the store.
 constexpr std::size_t kIdsPerCamera = 4;
-// From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a second.
+// From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
+// second.
 constexpr std::int64_t kMaxDelayS = 3;
 
 }  // namespace

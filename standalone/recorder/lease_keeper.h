@@ -24,8 +24,8 @@ class LeaseKeeper {
         : name_(std::move(name)),
           monotonic_us_(std::move(monotonic_us)) {}
 
-    // Renews or takes the lease when that is due; whether this process has it. first_reserved_id as in RecorderLease. While the
-    // store is away the lease stays. Throws store::StoreError.
+    // Renews or takes the lease when that is due; whether this process has it. first_reserved_id as in RecorderLease.
+    // While the store is away the lease stays. Throws store::StoreError.
     bool Hold(store::Store& store, int first_reserved_id);
     // Gives the lease back if this process has it: at a clean stop, when all rows are stored. Throws store::StoreError.
     void Release(store::Store& store);

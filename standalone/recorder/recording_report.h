@@ -2,7 +2,8 @@
 //
 // Hands the states of cameras and mounts to what writes them to files for the operator, in a thread of its own.
 //
-// Why so        A slow disk must not hold up the supervisor, which tells viewers every second that the recorder is alive.
+// Why so        A slow disk must not hold up the supervisor, which tells viewers every second that the recorder is
+//               alive.
 // Thread safety Any thread.
 #pragma once
 
@@ -28,8 +29,8 @@ class RecordingReport {
         bool operator==(const States&) const = default;
     };
 
-    // Starts the thread, which takes no signals and calls write. What write throws is logged, and it is called again for
-    // the next states. Throws std::system_error when no thread can be started.
+    // Starts the thread, which takes no signals and calls write. What write throws is logged, and it is called again
+    // for the next states. Throws std::system_error when no thread can be started.
     explicit RecordingReport(std::function<void(const States&)> write);
 
     // Has the thread write the states where they differ from the last; does not wait.

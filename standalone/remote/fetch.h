@@ -37,20 +37,20 @@ class Sink {
   public:
     virtual ~Sink() = default;
 
-    // Before the first byte. content_type: of those that were expected, with its parameters; printable ASCII. size: of the
-    // whole, -1 when it is not known.
+    // Before the first byte. content_type: of those that were expected, with its parameters; printable ASCII. size: of
+    // the whole, -1 when it is not known.
     virtual bool Begin(std::string_view content_type, std::int64_t size) = 0;
     virtual bool Write(std::span<const char> bytes) = 0;
     // Asked at least once a second, also while nothing comes.
     virtual bool GoesOn() = 0;
 };
 
-// Returns when the live view has ended or the sink has ended it. Throws NoAnswer when none began; InvalidCertificate; and
-// std::runtime_error when the library cannot be loaded. Blocks for a minute at most without a byte from the host.
+// Returns when the live view has ended or the sink has ended it. Throws NoAnswer when none began; InvalidCertificate;
+// and std::runtime_error when the library cannot be loaded. Blocks for a minute at most without a byte from the host.
 void FetchLiveView(const Host& host, const Request& request, Sink& sink);
 
-// The JSON text that the host answers with, 1 MiB at most, within ten seconds. Throws as above, NoAnswer also for an answer
-// that is cut off.
+// The JSON text that the host answers with, 1 MiB at most, within ten seconds. Throws as above, NoAnswer also for an
+// answer that is cut off.
 std::string FetchJson(const Host& host, const Request& request);
 
 }  // namespace lookhaven::remote

@@ -2,9 +2,9 @@
 //
 // Makes the segments of an installation's streams and finds them again.
 //
-// Why so        Keys can be computed and taken by any local user. A stream therefore has 65,536 keys, of which the first
-//               free one is used, and a ring is found by going through this user's segments, not by a key: what others
-//               take or give back changes nothing. Keys only narrow the search.
+// Why so        Keys can be computed and taken by any local user. A stream therefore has 65,536 keys, of which the
+//               first free one is used, and a ring is found by going through this user's segments, not by a key: what
+//               others take or give back changes nothing. Keys only narrow the search.
 #pragma once
 
 #include <cstdint>

@@ -37,8 +37,8 @@ std::string WithTimeouts(std::string location) {
 }
 
 // A Store is used by one thread, so connections need no locks of their own: they would be taken for each column of each
-// row. Most are opened for a few rows, so they reserve no memory: each of fifty pages would cost more than a row. Before
-// the first connection; SQLite refuses it later, which costs nothing but the time.
+// row. Most are opened for a few rows, so they reserve no memory: each of fifty pages would cost more than a row.
+// Before the first connection; SQLite refuses it later, which costs nothing but the time.
 void ConfigureSqlite() {
     static const int done = [] {
         sqlite_api::sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);

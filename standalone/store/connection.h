@@ -22,7 +22,8 @@ enum class Engine { kSqlite, kPostgresql };
 // supersedes, need not wait for the disk.
 enum class Durability { kSafe, kLazy };
 
-// Whether a change waits for another writer, or fails at once: what can as well be done later must not hold up a request.
+// Whether a change waits for another writer, or fails at once: what can as well be done later must not hold up a
+// request.
 enum class Patience { kWaits, kGivesUp };
 
 // A store's URL, parsed.
@@ -54,8 +55,8 @@ class Connection {
         }
     }
 
-    // Calls change(session) inside a transaction, which is rolled back when change throws. Inside another Write it is a part
-    // of that one, and what it throws must end that one.
+    // Calls change(session) inside a transaction, which is rolled back when change throws. Inside another Write it is a
+    // part of that one, and what it throws must end that one.
     template <typename Change>
     auto Write(Change&& change, Durability durability = Durability::kSafe, Patience patience = Patience::kWaits) {
         return Read([&](soci::session& sql) {

@@ -31,9 +31,9 @@ std::string EachCameraText(const std::string& condition, const std::string& orde
            condition + ") as found order by camera_id, " + order;
 }
 
-// The filter's rows, camera by camera. Either engine looks each camera up by itself: that way it uses the index (camera,
-// start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera; PostgreSQL, to
-// which a question is a message and an answer, once.
+// The filter's rows, camera by camera. Either engine looks each camera up by itself: that way it uses the index
+// (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera;
+// PostgreSQL, to which a question is a message and an answer, once.
 void Search(Connection& connection, soci::session& sql, const EventFilter& filter, std::int64_t limit,
             const Events::Visitor& visit) {
     // Nothing starts before this and still reaches the span.

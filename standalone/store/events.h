@@ -3,8 +3,8 @@
 // Recorded events: a row for each file of a camera's recording.
 //
 // Why so        The file is the record, the row is how it is found. So a row is made after its file exists, and while
-//               the file is being removed, the row is pending deletion, where no search finds it: a row that is found never
-//               points at nothing. There is no row per frame.
+//               the file is being removed, the row is pending deletion, where no search finds it: a row that is found
+//               never points at nothing. There is no row per frame.
 // Invariants    (1) begins before it ends, and at most kMaxRecordingSeconds later: what touches a span of time is found
 //                   by looking at a bounded stretch of the index (camera, start), however many events there are.
 //               (2) Ids come from one counter with those of marks and are never used twice.
@@ -97,8 +97,9 @@ class Events {
     // In one transaction; returns the number of rows removed. For rows without a file.
     int Remove(std::span<const int> ids);
 
-    // Removing files with their rows. Until FinishDeletion or CancelDeletion the rows are found by PendingDeletion alone. Each is
-    // one transaction. BeginDeletion leaves out growing and archived events: remove the files of PendingDeletion only.
+    // Removing files with their rows. Until FinishDeletion or CancelDeletion the rows are found by PendingDeletion
+    // alone. Each is one transaction. BeginDeletion leaves out growing and archived events: remove the files of
+    // PendingDeletion only.
     void BeginDeletion(std::span<const int> ids);
     void FinishDeletion(std::span<const int> ids);
     void CancelDeletion(std::span<const int> ids);     // the rows are as before
@@ -119,8 +120,8 @@ class Events {
     // Finished events of the mount that are neither archived nor demo, in the order in which they were recorded: those
     // after that event, from the first on after Event().
     std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
-    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far as
-    // dates tell. kOrderOfId when that is nothing.
+    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far
+    // as dates tell. kOrderOfId when that is nothing.
     std::int64_t OrderByDate(int mount_id, std::int64_t start_s);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);

@@ -86,8 +86,8 @@ class Marks {
     // Stores a pending mark and returns it with its id and with the span that the camera's recording plan asks for.
     // length_s: 0 … kMaxMarkSeconds, how long what happened took. text: UTF-8, at most kMaxMarkTextBytes, no control
     // characters but line ends. now_s: when it was reported. max_per_day: as many as that, of those that there are, may
-    // an account have reported within 24 hours, or earlier and still pending, however many report at once. Throws InvalidRecord, NotFound for an
-    // unknown camera, TooManyMarks.
+    // an account have reported within 24 hours, or earlier and still pending, however many report at once. Throws
+    // InvalidRecord, NotFound for an unknown camera, TooManyMarks.
     Mark Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
              const Reporter& reporter = {}, std::int64_t now_s = 0,
              std::int64_t max_per_day = std::numeric_limits<std::int64_t>::max());

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever hosts share the store.
+// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever hosts share the
+// store.
 //
 // Why so        Two recorders on one store would record every camera twice. The clocks of two hosts cannot be compared,
 //               so the holder counts up, and others take the lease over once the count has not changed for a while by

@@ -43,8 +43,8 @@ struct ServerDenial {
     int id = 0;                                 // on this host
 };
 
-// Tells pairings apart by the secret that both hosts share, without telling it; never 0. Means nothing outside this run of
-// the program.
+// Tells pairings apart by the secret that both hosts share, without telling it; never 0. Means nothing outside this run
+// of the program.
 std::uint64_t PairingId(const std::string& secret);
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.

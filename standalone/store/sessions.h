@@ -57,8 +57,8 @@ class Sessions {
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
 
-    // Records that the session is in use and postpones its end. Writes at most once a minute; true when it wrote. Throws
-    // StoreError at once when another writer has the store: the next request may touch the session.
+    // Records that the session is in use and postpones its end. Writes at most once a minute; true when it wrote.
+    // Throws StoreError at once when another writer has the store: the next request may touch the session.
     bool Touch(const Session& session, std::int64_t now_s);
 
     // False when there was no such session.

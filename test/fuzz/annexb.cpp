@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Puts frames together from any pieces of H.264 or H.265, and parameter sets in front of them: no byte may be lost, and the sets
-// must be found again.
+// Puts frames together from any pieces of H.264 or H.265, and parameter sets in front of them: no byte may be lost, and
+// the sets must be found again.
 #include "standalone/media/annexb.h"
 #include "standalone/media/frame_assembler.h"
 

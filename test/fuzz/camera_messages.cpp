@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Sends the recorder any bytes in the place of a camera's process: what comes out must be packets that the recorder may use,
-// and a failure's sentence that can go to a terminal.
+// Sends the recorder any bytes in the place of a camera's process: what comes out must be packets that the recorder may
+// use, and a failure's sentence that can go to a terminal.
 //
 // Why so        A frame must be of a time near now, which no corpus can hold, so times in the input count from now.
 #include "standalone/base/clock.h"

@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Answers a recorder with any bytes in the place of a camera, over RTSP or HTTP: whatever they are, the source must end, and
-// deliver only frames that it may.
+// Answers a recorder with any bytes in the place of a camera, over RTSP or HTTP: whatever they are, the source must
+// end, and deliver only frames that it may.
 //
-// Why so        There is no network: a connection to anywhere is a local pair of sockets, with the next part of the input and
-//               the end of the stream waiting in it. So a redirection leads back to the input too, and no name is looked up.
+// Why so        There is no network: a connection to anywhere is a local pair of sockets, with the next part of the
+//               input and the end of the stream waiting in it. So a redirection leads back to the input too, and no
+//               name is looked up.
 #include "standalone/media/source.h"
 
 #include <netdb.h>

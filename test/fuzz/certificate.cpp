@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads certificates out of any text, and out of any bytes in PEM: what is taken over is only certificates, and the name fits
-// into a URL.
+// Reads certificates out of any text, and out of any bytes in PEM: what is taken over is only certificates, and the
+// name fits into a URL.
 #include "standalone/remote/certificate.h"
 
 #include "standalone/base/text.h"

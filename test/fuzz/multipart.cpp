@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Feeds the reader of multipart answers any bytes, whole and in small pieces: both ways must give the same parts, none above the
-// limit.
+// Feeds the reader of multipart answers any bytes, whole and in small pieces: both ways must give the same parts, none
+// above the limit.
 #include "standalone/media/multipart_reader.h"
 
 #include "standalone/media/source.h"

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads a host's offer to pair out of any text, and out of any JSON: an offer that was read can be written and read again.
+// Reads a host's offer to pair out of any text, and out of any JSON: an offer that was read can be written and read
+// again.
 #include "standalone/cli/pair_text.h"
 
 #include "standalone/base/text.h"

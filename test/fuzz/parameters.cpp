@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Feeds any bytes to the readers of parameters and cookies, as a query string and as a form or JSON body beside it. What they
-// accept is text throughout, and can be written as JSON.
+// Feeds any bytes to the readers of parameters and cookies, as a query string and as a form or JSON body beside it.
+// What they accept is text throughout, and can be written as JSON.
 #include "standalone/api/parameters.h"
 
 #include "standalone/base/text.h"

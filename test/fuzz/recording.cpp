@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads two recordings with frames of any times, each by itself while it grows and both as a span: the invariants of the reader
-// must hold.
+// Reads two recordings with frames of any times, each by itself while it grows and both as a span: the invariants of
+// the reader must hold.
 #include "standalone/archive/recording_reader.h"
 
 #include <unistd.h>

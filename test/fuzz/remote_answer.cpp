@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Answers with any bytes in the place of a paired host: a live view must begin once, with a type that may be passed on, and a
-// list must be one of cameras or be refused.
+// Answers with any bytes in the place of a paired host: a live view must begin once, with a type that may be passed on,
+// and a list must be one of cameras or be refused.
 //
 // Why so        There is no network and no TLS, which both belong to libraries: a connection is a local pair of sockets
 //               with the input waiting in it, and the address is one of plain HTTP.

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Repairs a recording of any bytes, with an index of any bytes or none: what is saved must be playable, and repairing it again
-// must change nothing.
+// Repairs a recording of any bytes, with an index of any bytes or none: what is saved must be playable, and repairing
+// it again must change nothing.
 #include "standalone/archive/repair.h"
 
 #include "standalone/archive/recording_reader.h"

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Feeds a fuzz target with the files that the arguments name, folders with all in them: the main program where there is no
-// libFuzzer.
+// Feeds a fuzz target with the files that the arguments name, folders with all in them: the main program where there is
+// no libFuzzer.
 #include <algorithm>
 #include <cstdint>
 #include <cstdio>

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Changes any words of a ring, then reads it and lets a successor of its writer adopt it: no entry lies outside the segment.
+// Changes any words of a ring, then reads it and lets a successor of its writer adopt it: no entry lies outside the
+// segment.
 #include "standalone/ring/reader.h"
 #include "standalone/ring/writer.h"
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Feeds any bytes to the reader of span files: no recording that they name leads out of the camera's folder, and what was read
-// can be written.
+// Feeds any bytes to the reader of span files: no recording that they name leads out of the camera's folder, and what
+// was read can be written.
 #include "standalone/archive/span_file.h"
 
 #include "test/fuzz/fuzz.h"

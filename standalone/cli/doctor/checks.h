@@ -4,8 +4,8 @@
 //
 // Invariants    (1) A check judges as the user who runs it, who must be the one that runs the server.
 //               (2) It changes nothing and throws nothing. Where another check tells the cause, it finds nothing.
-//               (3) A remedy that begins with a command's name is that command line, ready to be run; "as root: " may stand
-//               before it, and words in capitals are for the owner to fill in. Any other is for hands.
+//               (3) A remedy that begins with a command's name is that command line, ready to be run; "as root: " may
+//               stand before it, and words in capitals are for the owner to fill in. Any other is for hands.
 #pragma once
 
 #include <string>

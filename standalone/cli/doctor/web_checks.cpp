@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What stands between this host and others: the web server, its certificate, IPv6, and the hosts that it is paired with.
+// What stands between this host and others: the web server, its certificate, IPv6, and the hosts that it is paired
+// with.
 #include <algorithm>
 #include <filesystem>
 #include <fstream>

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Live streams as the module attaches them: what ends the wait for a first picture, and the readers of a ring that goes.
+// Live streams as the module attaches them: what ends the wait for a first picture, and the readers of a ring that
+// goes.
 #include <atomic>
 #include <chrono>
 #include <csignal>

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The doctor: sees each thing that is wrong, is content when nothing is, and what it says to do mends the fault and loses
-// nothing.
+// The doctor: sees each thing that is wrong, is content when nothing is, and what it says to do mends the fault and
+// loses nothing.
 #include <cstdlib>
 #include <cstring>
 #include <fstream>

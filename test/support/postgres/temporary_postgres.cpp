@@ -16,8 +16,8 @@ namespace {
 
 constexpr std::chrono::seconds kStartDeadline{60};
 
-// PostgreSQL refuses to run as root. The watchdog has a session of its own, so that Ctrl-C reaches the test alone; it stops
-// the server and removes the folder when its input ends.
+// PostgreSQL refuses to run as root. The watchdog has a session of its own, so that Ctrl-C reaches the test alone; it
+// stops the server and removes the folder when its input ends.
 constexpr const char* kWatchdog = R"sh(exec setsid sh -c '
     cd "$0" && exec >log 2>&1
     as= programs=/usr/lib/postgresql/15/bin
