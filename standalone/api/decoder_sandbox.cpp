@@ -5,6 +5,7 @@
 
 #include <fcntl.h>
 #include <linux/landlock.h>
+#include <netinet/in.h>
 #include <sched.h>
 #include <sys/ioctl.h>
 #include <sys/mman.h>
@@ -17,6 +18,7 @@
 #include "standalone/base/file_descriptor.h"
 #include "standalone/base/log.h"
 #include "standalone/base/system_call_filter.h"
+#include "standalone/binding/common_record.h"
 
 namespace lookhaven::api {
 
@@ -25,15 +27,35 @@ using base::SystemCallFilter;
 
 namespace {
 
+constexpr std::uint64_t kWriting =
+    LANDLOCK_ACCESS_FS_WRITE_FILE | LANDLOCK_ACCESS_FS_MAKE_REG | LANDLOCK_ACCESS_FS_REMOVE_FILE;
+
+void MayWriteBelow(const base::FileDescriptor& rules, const std::filesystem::path& folder) {
+    const base::FileDescriptor opened(::open(folder.c_str(), O_PATH | O_CLOEXEC));
+    const landlock_path_beneath_attr beneath{.allowed_access = kWriting, .parent_fd = opened.Get()};
+    if (::syscall(SYS_landlock_add_rule, rules.Get(), LANDLOCK_RULE_PATH_BENEATH, &beneath, 0) != 0) {
+        base::ThrowErrno("cannot let a player write below " + folder.string());
+    }
+}
+
 // Whatever the rules say of files, a process under Landlock reaches no process outside: neither its memory nor its
-// descriptors, not even as root. A kernel without it leaves that to Yama.
-void CloseOtherProcesses() {
+// descriptors, not even as root. A kernel without it leaves that to Yama. It writes what a player has to: the store, its
+// progress and its player file; so it makes no process of ours one that is killed first.
+void CloseOtherProcesses(const std::filesystem::path& home) {
     landlock_ruleset_attr attributes{};
-    attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE;
+    attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE | kWriting | LANDLOCK_ACCESS_FS_MAKE_SYM |
+                                   LANDLOCK_ACCESS_FS_MAKE_SOCK | LANDLOCK_ACCESS_FS_MAKE_FIFO |
+                                   LANDLOCK_ACCESS_FS_REMOVE_DIR;
     const base::FileDescriptor rules(
         static_cast<int>(::syscall(SYS_landlock_create_ruleset, &attributes, sizeof attributes, 0)));
     if (!rules && (errno == ENOSYS || errno == EOPNOTSUPP)) {
         return;
+    }
+    if (rules) {
+        for (const std::filesystem::path& folder :
+             {home, std::filesystem::path("/tmp"), std::filesystem::path("/dev")}) {
+            MayWriteBelow(rules, folder);
+        }
     }
     if (!rules || ::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
         ::syscall(SYS_landlock_restrict_self, rules.Get(), 0) != 0) {
@@ -71,7 +93,7 @@ std::vector<sock_filter> StillPictureFilter() {
 
 // Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not
 // named.
-std::vector<sock_filter> PlaybackFilter() {
+std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     SystemCallFilter filter(SystemCallFilter::DefaultAction::kAllow);
     // Programs and processes. Threads are made by clone, since a filter cannot read what clone3 is told.
     filter.AddException({SCMP_SYS(execve), SCMP_SYS(execveat), SCMP_SYS(fork), SCMP_SYS(vfork), SCMP_SYS(clone3)});
@@ -97,7 +119,8 @@ std::vector<sock_filter> PlaybackFilter() {
                          SCMP_SYS(userfaultfd), SCMP_SYS(io_uring_setup), SCMP_SYS(io_uring_enter),
                          SCMP_SYS(io_uring_register), SCMP_SYS(keyctl), SCMP_SYS(add_key), SCMP_SYS(request_key),
                          SCMP_SYS(personality), SCMP_SYS(modify_ldt), SCMP_SYS(vmsplice)});
-    // It serves nobody, and speaks to a database's server alone: AF_UNIX, AF_INET, AF_INET6.
+    // It serves nobody, and speaks to a database's server alone, where there is one: AF_UNIX, AF_INET, AF_INET6; TCP, or
+    // UDP to a name server.
     filter.AddException({SCMP_SYS(bind), SCMP_SYS(listen), SCMP_SYS(accept), SCMP_SYS(accept4)});
     for (const int family : {0, 3, 4, 5, 6, 7, 8, 9, 11, 12, 13, 14, 15}) {
         filter.AddException({SCMP_SYS(socket)}, {{0, family}});
@@ -105,16 +128,31 @@ std::vector<sock_filter> PlaybackFilter() {
     for (const int bit : {16, 32}) {  // the higher ones
         filter.AddException({SCMP_SYS(socket)}, {{0, bit, bit}});
     }
+    for (int protocol = 1; protocol < 32; ++protocol) {
+        if (protocol != IPPROTO_TCP && protocol != IPPROTO_UDP) {
+            filter.AddException({SCMP_SYS(socket)}, {{2, protocol}});
+        }
+    }
+    for (const int bit : {32, 64, 128, 256, 512, 1024}) {
+        filter.AddException({SCMP_SYS(socket)}, {{2, bit, bit}});
+    }
+    filter.AddException({SCMP_SYS(socketpair)}, {ArgumentIsNot(0, AF_UNIX)});
+    if (store_url.starts_with("sqlite:")) {
+        for (const int family : {AF_INET, AF_INET6}) {
+            filter.AddException({SCMP_SYS(socket)}, {{0, family}});
+        }
+    }
     return filter.Program();
 }
 
-void EnterPlaybackSandbox(const std::vector<sock_filter>& playback_filter) {
-    CloseOtherProcesses();
+void EnterPlaybackSandbox(const std::filesystem::path& home, const std::vector<sock_filter>& playback_filter) {
+    CloseOtherProcesses(home);
     Install(playback_filter);
 }
 
 void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own) {
     slots.KeepOnly(own);
+    binding::ReleaseCommonRecord();
     Install(StillPictureFilter());
 }
 

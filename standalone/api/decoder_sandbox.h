@@ -9,6 +9,8 @@
 //               keep their own slot (SlotTable::KeepOnly), a player once the host knows it.
 #pragma once
 
+#include <filesystem>
+#include <string>
 #include <vector>
 
 #include <linux/filter.h>
@@ -18,10 +20,10 @@
 namespace lookhaven::api {
 
 // What EnterPlaybackSandbox needs, made once for all players. Throws std::system_error.
-std::vector<sock_filter> PlaybackFilter();
+std::vector<sock_filter> PlaybackFilter(const std::string& store_url);
 // Each confines the calling process, which has one thread, for good. Where the kernel has no filters it is logged, and
 // the process keeps its calls. Throws std::system_error.
-void EnterPlaybackSandbox(const std::vector<sock_filter>& playback_filter);
+void EnterPlaybackSandbox(const std::filesystem::path& home, const std::vector<sock_filter>& playback_filter);
 void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own);
 
 }  // namespace lookhaven::api

@@ -93,7 +93,9 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     }
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     call.slots.KeepOnly(call.slot);
-    EnterPlaybackSandbox(PlaybackFilter());  // the copier reads what a camera has sent
+    const base::Installation& installation = call.context.Installation();
+    // The copier reads what a camera has sent.
+    EnterPlaybackSandbox(installation.Home(), PlaybackFilter(installation.StoreUrl()));
     try {
         remux.Copy(path, STDOUT_FILENO, options);
     } catch (const std::system_error& error) {

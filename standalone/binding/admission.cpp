@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The recording service of this host, and the right to use the application.
+#include <utility>
+
 #include "platform/admission/host.h"
 #include "platform/admission/pairauth.h"
 #include "platform/live/commoncfg.h"
 #include "standalone/base/clock.h"
+#include "standalone/binding/common_record.h"
 #include "standalone/binding/request.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/control/common_config.h"
@@ -20,18 +23,25 @@ static_assert(offsetof(LHShmCommonCfg, m_blPause) == offsetof(control::CommonCon
 
 namespace {
 
+control::CommonConfig* g_record = nullptr;
+
 // Mapped once; asked again only while there is none, since the record may come later.
 control::CommonConfig* CommonRecord() {
-    static control::CommonConfig* record = nullptr;
-    if (record == nullptr) {
-        record = OrFailure<control::CommonConfig*>("common configuration", nullptr, [] {
+    if (g_record == nullptr) {
+        g_record = OrFailure<control::CommonConfig*>("common configuration", nullptr, [] {
             return control::MapCommonConfig(RequestContext::Current().Installation());
         });
     }
-    return record;
+    return g_record;
 }
 
 }  // namespace
+
+void lookhaven::binding::ReleaseCommonRecord() {
+    if (control::CommonConfig* record = std::exchange(g_record, nullptr); record != nullptr) {
+        control::UnmapCommonConfig(record);
+    }
+}
 
 LHShmCommonCfg* LHShmCommonCfgAt() {
     return reinterpret_cast<LHShmCommonCfg*>(CommonRecord());

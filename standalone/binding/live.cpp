@@ -52,6 +52,8 @@ constexpr long kAttachPollNanos = 10'000'000;
 ring::SecondReader g_sound;
 // A muxed stream needs each frame, so it falls behind on a slow connection; from here on it skips to a key frame.
 constexpr std::int64_t kMaxBehindMs = 2'000;
+// The stream is not to end by the time-out of who writes nothing for twenty seconds.
+constexpr std::int64_t kMaxSoundPauseUs = 10'000'000;
 
 ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
     return reinterpret_cast<ring::Position*>(position);
@@ -103,6 +105,7 @@ struct Lag {
     bool is_held_back = false;  // a slow connection kept it from the newest frame
     bool is_skipping = false;
     bool is_sound_held_back = false;
+    std::int64_t sound_us = 0;  // monotonic, when sound was last given out
 } g_lag;
 
 // Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that
@@ -127,11 +130,14 @@ bool HasFreshKeyFrame(void* stream) {
 // Sound would fill the connection that the pictures wait for. It waits too, and goes on with the newest where that made
 // it late.
 const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position* position) {
-    if (!IsDrained()) {
+    if (!IsDrained() && MonotonicMicros() - g_lag.sound_us < kMaxSoundPauseUs) {
         g_lag.is_sound_held_back = true;
         return nullptr;
     }
     const ring::Entry* entry = ring::ReadNext(stream, last_sequence, position);
+    if (entry != nullptr) {
+        g_lag.sound_us = MonotonicMicros();
+    }
     if (entry == nullptr || !std::exchange(g_lag.is_sound_held_back, false) || !IsBehind(*entry)) {
         return entry;
     }

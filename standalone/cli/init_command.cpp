@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven init: creates the state folder, or upgrades an existing one.
+#include <algorithm>
 #include <cstdint>
 #include <filesystem>
 #include <system_error>
@@ -22,11 +23,19 @@ struct Request {
     std::string admin;
 };
 
+// What an attempt that was cut off has left.
+bool HoldsEmptyFoldersOnly(const std::string& home) {
+    std::error_code error;
+    return std::ranges::all_of(std::filesystem::directory_iterator(home, error), [](const auto& entry) {
+        std::error_code ignored;
+        return entry.is_directory(ignored) && std::filesystem::is_empty(entry.path(), ignored);
+    });
+}
+
 // Where other things lie, neither our files belong nor is anything ours to change.
 void RequireOwnFolder(const std::string& home) {
     std::error_code error;
-    if (!base::IsStateFolder(home) && std::filesystem::exists(home, error) && !std::filesystem::is_empty(home, error) &&
-        !error) {
+    if (!base::IsStateFolder(home) && std::filesystem::exists(home, error) && !HoldsEmptyFoldersOnly(home) && !error) {
         throw Failure(kCannotCreate, "the folder ", home,
                       " is not empty and is no state folder: choose another with --home");
     }

@@ -2,9 +2,13 @@
 #include "standalone/control/common_config.h"
 
 #include <array>
+#include <cstdint>
 #include <filesystem>
 #include <optional>
 #include <system_error>
+
+#include <sys/mman.h>
+#include <unistd.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/process.h"
@@ -78,6 +82,13 @@ CommonConfig* MapCommonConfig(const base::Installation& installation) try {
     return table ? &table->Release()->config : nullptr;
 } catch (const std::system_error&) {
     return nullptr;
+}
+
+// It lies at the beginning of a mapping of less than a page.
+void UnmapCommonConfig(CommonConfig* config) {
+    const auto address = reinterpret_cast<std::uintptr_t>(config);
+    const std::uintptr_t page = static_cast<std::uintptr_t>(::sysconf(_SC_PAGESIZE));
+    ::munmap(reinterpret_cast<void*>(address & ~(page - 1)), sizeof(CommonConfigFile));
 }
 
 RecorderState FindRecorder(const base::Installation& installation) try {

@@ -41,6 +41,7 @@ class CommonConfigKeeper {
 // The record, mapped until the process ends; null while there is none of this boot. Keep the pointer: each call maps it
 // again.
 CommonConfig* MapCommonConfig(const base::Installation& installation);
+void UnmapCommonConfig(CommonConfig* config);
 
 enum class RecorderState {
     kNone,   // none runs

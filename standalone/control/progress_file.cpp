@@ -4,10 +4,13 @@
 #include <atomic>
 #include <cerrno>
 #include <chrono>
+#include <stdexcept>
 #include <string>
 #include <thread>
 
 #include <unistd.h>
+
+#include "standalone/base/text.h"
 
 namespace lookhaven::control {
 
@@ -18,7 +21,11 @@ constexpr pid_t kSwept = -1;
 constexpr int kAttempts = 5;
 constexpr std::chrono::milliseconds kPause{1};
 
+// Throws std::invalid_argument for what is no session's handle: a process that was taken over may have left anything.
 std::filesystem::path PathOf(const std::filesystem::path& folder, std::int64_t key, std::string_view session) {
+    if (!base::IsHex(session, session.size())) {
+        throw std::invalid_argument("no session has this handle");
+    }
     return folder / std::to_string(key).append(".").append(session);
 }
 

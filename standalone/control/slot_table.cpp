@@ -2,6 +2,7 @@
 #include "standalone/control/slot_table.h"
 
 #include <algorithm>
+#include <functional>
 #include <stdexcept>
 
 #include <sys/eventfd.h>
@@ -67,6 +68,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
         new (slot) Slot{};
         guard_->used = index + 1;
     }
+    slot->ended = 0;  // a process that was taken over may have left anything
     slot->is_stream = false;
     slot->has_session = false;
     slot->pid = 0;
@@ -255,24 +257,26 @@ std::set<std::string> SlotTable::SessionsWithPlayers() const {
 }
 
 std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newest) const {
-    std::vector<Slot*> others;
+    std::vector<std::pair<std::int64_t, Slot*>> others;  // when they began, read once: a player may change it
     const Slot* owner = nullptr;
     for (Slot& slot : Used()) {
         if (slot.serial != 0 && slot.pid == newest && SessionOf(slot) == session) {
             owner = &slot;
-        } else if (IsPlayerOf(slot, session) && slot.player.started_us != 0) {
-            others.push_back(&slot);
+        } else if (const std::int64_t started_us = slot.player.started_us;
+                   IsPlayerOf(slot, session) && started_us != 0) {
+            others.emplace_back(started_us, &slot);
         }
     }
     if (newest <= 0 || owner == nullptr) {
         return {};
     }
-    std::sort(others.begin(), others.end(),
-              [](const Slot* left, const Slot* right) { return left->player.started_us > right->player.started_us; });
-    const int places = owner->player.max_players - (owner->MustEnd() ? 0 : 1);
-    const auto staying = std::min<std::size_t>(others.size(), static_cast<std::size_t>(places));
-    others.erase(others.begin(), others.begin() + static_cast<std::ptrdiff_t>(staying));
-    return others;
+    std::ranges::sort(others, std::greater());
+    const int places = std::max(0, owner->player.max_players - (owner->MustEnd() ? 0 : 1));
+    std::vector<Slot*> excess;
+    for (std::size_t at = static_cast<std::size_t>(places); at < others.size(); ++at) {
+        excess.push_back(others[at].second);
+    }
+    return excess;
 }
 
 void SlotTable::Wake() {

@@ -30,6 +30,11 @@ ScgiParser::State ScgiParser::Feed(std::string_view bytes) {
     return state_;
 }
 
+ScgiParser::~ScgiParser() {
+    http::Wipe(head_);
+    request_.Wipe();
+}
+
 std::size_t ScgiParser::TakeLength(char byte) {
     if (byte == ':' && head_bytes_ > 0) {
         place_ = Place::kHead;
@@ -49,7 +54,7 @@ std::size_t ScgiParser::TakeHead(std::string_view bytes) {
     head_.append(bytes.substr(0, used));
     if (head_.size() == head_bytes_ + 1) {
         ParseHead();
-        std::string().swap(head_);
+        http::Wipe(head_);
     }
     return used;
 }

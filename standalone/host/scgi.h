@@ -20,6 +20,12 @@ class ScgiParser {
   public:
     enum class State { kIncomplete, kComplete, kMalformed };
 
+    ScgiParser() = default;
+    ScgiParser(ScgiParser&&) = default;
+    ScgiParser& operator=(ScgiParser&&) = default;
+    // Overwrites what it has kept.
+    ~ScgiParser();
+
     static constexpr std::size_t kMaxHeadBytes = 8 * 1024;
     static constexpr std::size_t kMaxBodyBytes = 1024 * 1024;
     static constexpr std::size_t kMaxAwaitedBodyBytes = 4096;

@@ -5,6 +5,7 @@
 #include <cctype>
 #include <cerrno>
 #include <csignal>
+#include <cstring>
 
 #include <sys/epoll.h>
 #include <sys/signalfd.h>
@@ -167,7 +168,10 @@ void Server::Read(int socket) {
     if (got <= 0) {
         connections_.erase(found);
     } else if (!connection.refused) {
-        switch (connection.parser.Feed({bytes.data(), static_cast<std::size_t>(got)})) {
+        const ScgiParser::State state = connection.parser.Feed({bytes.data(), static_cast<std::size_t>(got)});
+        ::explicit_bzero(bytes.data(),
+                         static_cast<std::size_t>(got));  // processes that are forked here would inherit it
+        switch (state) {
         case ScgiParser::State::kIncomplete:
             return;
         case ScgiParser::State::kMalformed:
@@ -203,9 +207,11 @@ void Server::StartRequest(Connection connection) {
         return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
     }
     const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {
+        connections_.clear();  // others' requests, and their descriptors, whose numbers are given anew after this
         LeaveHost(host, slots_, number);
         work_.serve_request(request, slots_, *slot);
     });
+    request.Wipe();
     if (!process) {
         slots_.Free(*slot);
         return Refuse(connections_[number] = std::move(connection), 503, "cannot start a request process");

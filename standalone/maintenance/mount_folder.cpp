@@ -89,10 +89,10 @@ std::vector<std::string> NamesIn(int folder) {
 // What a file system does not know it reports as 0 or -1.
 MountSpace SpaceFrom(const struct statvfs& report) {
     const auto bytes = [&](std::uint64_t blocks) { return static_cast<std::int64_t>(blocks * report.f_frsize); };
-    MountSpace space{bytes(report.f_blocks), std::max<std::int64_t>(bytes(report.f_bavail), 0),
-                     static_cast<std::int64_t>(report.f_files), static_cast<std::int64_t>(report.f_favail)};
-    if (space.total_bytes <= 0) {
-        space.total_bytes = 0;
+    MountSpace space{bytes(report.f_blocks), bytes(report.f_bavail), static_cast<std::int64_t>(report.f_files),
+                     static_cast<std::int64_t>(report.f_favail)};
+    space.total_bytes = std::max<std::int64_t>(space.total_bytes, 0);
+    if (space.total_bytes == 0 || space.free_bytes < 0) {
         space.free_bytes = kPlentyBytes;
     }
     if (space.total_files <= 0 || space.free_files < 0) {

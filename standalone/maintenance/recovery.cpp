@@ -36,7 +36,11 @@ bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, 
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
         if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_reserved_id &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
-            is_complete &= Try([&] { return AdoptRecording(events, mount, mount_id, file.name, events.NextId()); });
+            is_complete &= Try([&] {
+                const int new_id = events.NextId();
+                return AdoptRecording(events, mount, mount_id, file.name, new_id,
+                                      std::min(first_reserved_id, new_id + 1));
+            });
         }
     }
     return is_complete;

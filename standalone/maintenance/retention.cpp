@@ -31,6 +31,10 @@ std::vector<int> IdsOf(std::span<const store::Event> events) {
     return ids;
 }
 
+bool IsOlderThanLimit(const store::Mount& mount, const store::Event& event, std::int64_t now_s) {
+    return mount.max_age_s > 0 && event.end_s <= now_s - mount.max_age_s;
+}
+
 class Retention {
   public:
     Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
@@ -145,7 +149,7 @@ class Retention {
     // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a
     // mount.
     bool IsExpired(const store::Event& event) const {
-        return has_age_limit_ && event.end_s <= now_s_ - mount_.max_age_s;
+        return has_age_limit_ && IsOlderThanLimit(mount_, event, now_s_);
     }
 
     void Delete(std::span<const store::Event> events) {
@@ -259,19 +263,26 @@ class Retention {
 RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
     store::Events events(store);
     RetentionForecast forecast;
+    RetentionForecast misdated;  // in the future: as old as what was recorded after them
     const std::int64_t excess_bytes = mount.max_bytes > 0 ? events.Content(mount.id).size_bytes - mount.max_bytes : 0;
-    const std::int64_t keep_from_s = mount.max_age_s > 0 ? now_s - mount.max_age_s : 0;
+    std::int64_t bytes = 0;
     store::Event after;
     for (;;) {
         const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsAtOnce);
         for (const store::Event& event : oldest) {
             after = event;
-            if (forecast.bytes >= excess_bytes && event.end_s > keep_from_s) {
+            const bool is_deleted = bytes < excess_bytes || IsOlderThanLimit(mount, event, now_s);
+            const bool may_be_deleted = mount.max_age_s > 0 && event.end_s > now_s;
+            if (!is_deleted && !may_be_deleted) {
                 return forecast;
             }
-            ++forecast.events;
-            forecast.bytes += event.size_bytes;
-            forecast.end_s = std::max(forecast.end_s, event.end_s);
+            bytes += event.size_bytes;
+            misdated = {misdated.events + 1, misdated.bytes + event.size_bytes, std::max(misdated.end_s, event.end_s)};
+            if (is_deleted) {
+                forecast = {forecast.events + misdated.events, forecast.bytes + misdated.bytes,
+                            std::max(forecast.end_s, misdated.end_s)};
+                misdated = {};
+            }
         }
         if (oldest.size() < kEventsAtOnce) {
             return forecast;

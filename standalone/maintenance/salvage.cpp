@@ -84,16 +84,16 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
 }
 
 std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int new_id) {
+                           int new_id, int keep_below) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     const std::optional<store::Event> present = events.Find(name.event);
-    if (IsRowOf(present, name)) {
+    if (IsRowOf(present, name) || events.IsPendingDeletion(name.event)) {
         return "its event has come meanwhile";
     }
     if (contents.frame_count == 0) {
         return Discard(mount, name);
     }
-    if (!present && name.event <= new_id) {
+    if (!present && name.event < keep_below) {
         events.Begin(RowOf(name, mount_id, contents));
         return "adopted " + (mount.Path() / archive::PathOf(name)).string();
     }
@@ -103,7 +103,7 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
         return "left " + archive::PathOf(name) + " alone: a file with its new id exists already";
     }
     store::Event row = RowOf(renamed, mount_id, contents);
-    row.order = events.OrderByDate(mount_id, row.start_s);
+    row.order = events.OrderForDate(mount_id, row.start_s);
     events.Begin(row);
     return "adopted " + (mount.Path() / row.path).string();
 }

@@ -34,7 +34,7 @@ class Verification {
           repair_(repair),
           progress_(progress),
           left_alone_(left_alone),
-          next_id_(NewId()) {}
+          next_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
 
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
@@ -182,6 +182,7 @@ class Verification {
         std::ranges::sort(files, {}, [](const MountFolder::File& file) { return file.name.start_s; });
         if (repair_) {
             store::Mounts(store_).ReserveIds(mount.LastCamera(), 0);
+            listed_below_ = events_.NextId();
         }
         for (const MountFolder::File& file : files) {
             if (!expected.contains(archive::PathOf(file.name)) && file.changed_s < newest_s) {
@@ -216,27 +217,26 @@ class Verification {
 
     void CheckStrayRecording(const MountFolder& mount, int mount_id, const archive::FileName& name,
                              const std::string& path) {
-        const int new_id = NewId();
-        if (IsReserved(name.event, new_id)) {
+        const store::LeaseState lease = store::RecorderLease(store_).Current();
+        const bool has_recorder = !lease.holder.empty();
+        if (has_recorder && name.event >= lease.first_reserved_id && name.event < listed_below_) {
             report_.faults.push_back(
                 {"no event has the file " + path + " yet: the recorder may be about to store one", ""});
             return;
         }
-        Report("no event has the file " + path, [&] { return AdoptRecording(events_, mount, mount_id, name, new_id); });
-    }
-
-    int NewId() { return repair_ ? events_.NextId() : std::numeric_limits<int>::max(); }
-
-    // While the store is out of a recorder's reach, the rows of its finished files wait in its memory; their ids are
-    // among those that were given out to it. new_id was given out after the file was seen and before the lease is read,
-    // so a recorder that takes the lease after this has higher ids.
-    bool IsReserved(int id, int new_id) {
-        const store::LeaseState lease = store::RecorderLease(store_).Current();
-        return !lease.holder.empty() && id >= lease.first_reserved_id && id < new_id;
+        Report("no event has the file " + path, [&] {
+            int new_id = events_.NextId();
+            if (has_recorder && new_id == name.event) {
+                new_id = events_.NextId();
+            }
+            return AdoptRecording(events_, mount, mount_id, name, new_id, has_recorder ? listed_below_ : new_id + 1);
+        });
     }
 
     // True for an event that began after the rows were read.
-    bool HasRow(const archive::FileName& name) { return IsRowOf(events_.Find(name.event), name); }
+    bool HasRow(const archive::FileName& name) {
+        return IsRowOf(events_.Find(name.event), name) || events_.IsPendingDeletion(name.event);
+    }
 
     bool HasMark(int id) {
         store::Marks marks(store_);
@@ -257,6 +257,10 @@ class Verification {
     const std::function<void(std::size_t, std::size_t)>& progress_;
     const std::map<int, std::string>& left_alone_;
     const int next_id_;
+    // Given out once the mount's files were listed. While the store is out of a recorder's reach, the rows of its
+    // finished files wait in its memory: those among them have lower ids, and a file with a higher one is of an earlier
+    // store, whatever reserve the recorder gets meanwhile.
+    int listed_below_ = std::numeric_limits<int>::max();
     VerifyReport report_;
 };
 

@@ -26,10 +26,14 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(),
                                                    [this](const store::Mark& mark) { return FootageHasEnded(mark); });
                     }) {
-    for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
-        if (status.lost_since_s > 0) {
-            lost_since_s_.emplace(status.camera, status.lost_since_s);
+    try {
+        for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+            if (status.lost_since_s > 0) {
+                lost_since_s_.emplace(status.camera, status.lost_since_s);
+            }
         }
+    } catch (const std::exception& failure) {
+        base::LogWarning(std::string("cannot read since when cameras are down: ") + failure.what());
     }
 }
 

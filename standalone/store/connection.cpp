@@ -142,15 +142,16 @@ Connection::Transaction::~Transaction() {
     if (is_part_) {
         return;
     }
-    try {
-        if (is_open_) {
-            session_ << "rollback";
-        }
-        for (const std::string& statement : restore_) {
+    if (is_open_) {
+        // SQLite may have rolled back by itself, as where the disk is full.
+        restore_.insert(restore_.begin(), "rollback");
+    }
+    for (const std::string& statement : restore_) {
+        try {
             session_ << statement;
+        } catch (const soci::soci_error&) {
+            // The connection is gone, and the transaction with it.
         }
-    } catch (const soci::soci_error&) {
-        // The connection is gone, and the transaction with it.
     }
 }
 

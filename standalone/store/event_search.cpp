@@ -108,10 +108,26 @@ std::vector<Event> Events::InRecordingOrder(int mount_id, const Event& after, in
         mount_id, after.order, after.id, limit);
 }
 
-std::int64_t Events::OrderByDate(int mount_id, std::int64_t start_s) {
-    const std::vector<Event> next =
-        List({.camera_ids = CamerasOn(mount_id), .mount_id = mount_id, .begin_s = start_s, .limit = 1});
-    return next.empty() ? kOrderOfId : next.front().order - 1;
+bool Events::IsPendingDeletion(int id) {
+    return connection_.FetchOne<int>("select count(*) from events_pending_deletion where id = :id", id).value() > 0;
+}
+
+std::int64_t Events::OrderForDate(int mount_id, std::int64_t start_s) {
+    const std::set<int> cameras = CamerasOn(mount_id);
+    const std::vector<Event> next = List({.camera_ids = cameras, .mount_id = mount_id, .begin_s = start_s, .limit = 1});
+    if (next.empty()) {
+        return kOrderOfId;
+    }
+    // What was recorded before it: a single row that a wrong clock dated ahead does not make it old.
+    std::int64_t order = next.front().order - 1;
+    for (const int camera : cameras) {
+        for (const Event& before : connection_.FetchAll<Event>(
+                 "where camera_id = :camera and start_s < :start and mount_id = :mount order by start_s desc limit 1",
+                 camera, start_s, mount_id)) {
+            order = std::max(order, before.order);
+        }
+    }
+    return order;
 }
 
 void Events::VisitMount(int mount_id, const Visitor& visitor) {

@@ -120,9 +120,10 @@ class Events {
     // Finished events of the mount that are neither archived nor demo, in the order in which they were recorded: those
     // after that event, from the first on after Event().
     std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
-    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far
-    // as dates tell. kOrderOfId when that is nothing.
-    std::int64_t OrderByDate(int mount_id, std::int64_t start_s);
+    bool IsPendingDeletion(int id);
+    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far as
+    // dates tell, but not before what precedes it. kOrderOfId when nothing was recorded after it.
+    std::int64_t OrderForDate(int mount_id, std::int64_t start_s);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.

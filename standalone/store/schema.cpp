@@ -146,13 +146,18 @@ constexpr const char* kInsecureCameras[] = {
 
 // The order was that of ids, which says nothing of an old recording that got a new one.
 constexpr const char* kRenumberedRecordings[] = {
-    "alter table events add column recording_order bigint not null default 0",
+    // A recorder of an earlier version may still add rows: not the first to be deleted.
+    "alter table events add column recording_order bigint not null default 9223372036854775807",
     "update events set recording_order = id",
     "alter table events_pending_deletion add column recording_order bigint not null default 0",
     "update events_pending_deletion set recording_order = id",
     "drop index events_by_order",
     "create index events_by_order on events (mount_id, recording_order, id, size_bytes)"
     " where recording = 0 and archived = 0 and demo = 0",
+};
+
+constexpr const char* kPendingReports[] = {
+    "create index marks_pending_by_reporter on marks (reporter_id, reported_s) where state = 0 and reporter_id <> 0",
 };
 
 constexpr Migration kMigrations[] = {
@@ -163,6 +168,7 @@ constexpr Migration kMigrations[] = {
     {"events pending deletion, the order of recording, the recorder lease", kRecordingOrder},
     {"cameras whose HTTPS certificate is not verified", kInsecureCameras},
     {"the order of recordings that got a new id", kRenumberedRecordings},
+    {"reports whose footage is still to come", kPendingReports},
 };
 
 }  // namespace

@@ -101,6 +101,9 @@ int Store::Migrate(const std::string& url) {
     PrepareFile(address);
     Connection connection(address);
     return connection.Write([&](soci::session& sql) {
+        if (!connection.IsSqlite()) {
+            Execute(sql, "set local statement_timeout = 0");  // a step may rewrite a million rows
+        }
         LockSchema(connection, sql);
         const int version = ReadVersion(connection);
         if (version > SchemaVersion()) {

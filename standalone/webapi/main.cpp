@@ -79,7 +79,7 @@ void Run(const Options& options) {
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
-    const api::Service service{installation, modules, options.requests, api::PlaybackFilter()};
+    const api::Service service{installation, modules, options.requests, api::PlaybackFilter(installation.StoreUrl())};
     const host::ChildWork work{
         .serve_request = [&service](http::Request& request, control::SlotTable& slots,
                                     control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },

@@ -23,6 +23,7 @@ Auth.Status                                                           E      E  
 Auth.Login                                                            M      M     M       M     M    M       M        M      M       M
 Auth.Logout                                                           M      M     M       M     M    M       M        M      M       M
 Catalog.Groups: camera                                                E      E     D       O     D    D       D        D      D       E
+Catalog.CameraStates: camera                                          E      E     D       O     D    D       D        D      D       E
 Catalog.Mounts: camera                                                E      E     D       O     D    D       D        D      D       E
 Catalog.Emaps: map                                                    E      E     D       D     D    O       D        D      D       E
 Emap.States emap={map}: door                                          E      E     D/N     D/N   D/N  N       O/N      D/N    D/N     E

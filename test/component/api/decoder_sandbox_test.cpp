@@ -64,9 +64,9 @@ TEST(DecoderSandbox, LeavesADecoderWhatItsProcessNeeds) {
     const control::Slot& other = *slots.Take();
     const control::Slot& own = *slots.Take();
     const int wake = slots.WakeDescriptor();
-    const auto filter = api::PlaybackFilter();
+    const auto filter = api::PlaybackFilter("postgresql:");
     const auto play = [&] {
-        api::EnterPlaybackSandbox(filter);
+        api::EnterPlaybackSandbox(home.Path(), filter);
         slots.KeepOnly(own);
     };
     ::prctl(PR_SET_PTRACER, PR_SET_PTRACER_ANY);  // else Yama might be what refuses
@@ -100,6 +100,8 @@ TEST(DecoderSandbox, LeavesADecoderWhatItsProcessNeeds) {
         {"reads its own", [&] { return ::write(connection[0], &own.serial, 1) == 1; }, true, true},
         {"wakes the host", [wake, one = std::uint64_t{1}] { return ::write(wake, &one, sizeof one) > 0; }, false},
         {"opens a socket of a rare family", [] { return ::socket(AF_NETLINK, SOCK_RAW, 0) >= 0; }, false},
+        {"opens one of a rare protocol", [] { return ::socket(AF_INET, SOCK_STREAM, 262) >= 0; }, false},
+        {"has itself spared", [&] { return ::open("/proc/self/oom_score_adj", O_WRONLY) >= 0; }, lacks_landlock},
         {"listens", [] { return ::listen(::socket(AF_INET, SOCK_STREAM, 0), 1) == 0; }, false},
         {"reaches a database", [] { return ::socket(AF_UNIX, SOCK_STREAM, 0) >= 0; }, true},
         {"opens a recording", [] { return ::open("/proc/self/maps", O_RDONLY) >= 0; }, true},

@@ -14,9 +14,8 @@ using FormatTest = RingTest;
 TEST_F(FormatTest, FramesAndFormatsAreTakenWithinTheirBounds) {
     Writer writer(installation_, {7, 1, Medium::kVideo},
                   {std::string(40, 'c'), std::vector<unsigned char>(1025), 1, 2, true}, kSmall);
-    void* ring = writer.Address();
-    EXPECT_EQ(std::string(Codec(ring)), std::string(31, 'c'));
-    EXPECT_TRUE(ExtraData(ring).empty());
+    EXPECT_EQ(std::string(Codec(writer.Address())), std::string(31, 'c'));
+    EXPECT_TRUE(ExtraData(writer.Address()).empty());
     struct Row {
         std::size_t size_bytes;
         int offset;
@@ -28,14 +27,14 @@ TEST_F(FormatTest, FramesAndFormatsAreTakenWithinTheirBounds) {
         EXPECT_EQ(writer.Write({.data = data, .offset = row.offset}), row.expected)
             << row.size_bytes << " bytes, offset " << row.offset;
     }
-    const Entry* largest = ReadLatest(ring);
+    const Entry* largest = ReadLatest(writer.Address());
     ASSERT_NE(largest, nullptr);
     EXPECT_TRUE(IsFilled(*largest, 1));
-    StopRead(ring, nullptr);
+    StopRead(writer.Address(), nullptr);
 
     writer.SetFormat({"H264", std::vector<unsigned char>(1024, 9), 640, 360, false});
-    EXPECT_THAT(ExtraData(ring), testing::AllOf(testing::SizeIs(1024), testing::Each(9)));
-    EXPECT_EQ(Width(ring) * 1000 + Height(ring), 640'360);
+    EXPECT_THAT(ExtraData(writer.Address()), testing::AllOf(testing::SizeIs(1024), testing::Each(9)));
+    EXPECT_EQ(Width(writer.Address()) * 1000 + Height(writer.Address()), 640'360);
 
     void* silence = AttachEmpty({7, 1, Medium::kAudio}, {"AAC", {7}, 0, 0, true});
     EXPECT_STREQ(Codec(silence), "AAC");
