@@ -2,8 +2,8 @@
 """Many viewers of one live stream: what they cost and how late their pictures are, beside a bare server in the same run.
 
 A feeder stands in for the recorder, so that only serving is measured; everything else is the real thing: ring, module,
-host, and nginx where the row says so. The first table is about plain sockets, the second about the road of browsers: TLS and
-HTTP/2 with 32 streams on a connection, beside the same nginx relaying the bare server.
+host, and nginx where the row says so. The first table is about plain sockets, the second about TLS and HTTP/2 with 32
+streams on a connection, beside the same nginx relaying the bare server.
 """
 
 import contextlib

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Admission without a privilege of the login session: the user's application privilege, and peers with a cookie pair.
+// Admission without a privilege of the login session: the user's application privilege, and paired hosts with a cookie
+// pair.
 #pragma once
 
 #include <string>

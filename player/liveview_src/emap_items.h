@@ -23,8 +23,8 @@ class EmapItems {
 
     // Adds all items. An item whose device cannot be loaded is skipped after a log line.
     void Add(const Emap& emap);
-    // Removes the cameras, links and I/O modules that the user may not access. A peer admitted by pair matching gets
-    // all.
+    // Removes the cameras, links and I/O modules that the user may not access. A paired host admitted by pair
+    // matching gets all.
     void Filter(unsigned int uid);
     // Cameras, links, doors, I/O modules, POS terminals; each kind by ascending id, the items of a device in e-map
     // order.

@@ -39,9 +39,9 @@ void MayWriteBelow(const base::FileDescriptor& rules, const std::filesystem::pat
 }
 
 // Whatever the rules say of files, a process under Landlock reaches no process outside: neither its memory nor its
-// descriptors, not even as root. A kernel without it leaves that to Yama. It writes what a player has to: the store, its
-// progress and its player file; so it makes no process of ours one that is killed first.
-void CloseOtherProcesses(const std::filesystem::path& home) {
+// descriptors, not even as root. A kernel without it leaves that to Yama. It writes what a player has to: the store,
+// its progress and its player file; so it makes no process of ours one that is killed first.
+void ShieldOtherProcesses(const std::filesystem::path& home) {
     landlock_ruleset_attr attributes{};
     attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE | kWriting | LANDLOCK_ACCESS_FS_MAKE_SYM |
                                    LANDLOCK_ACCESS_FS_MAKE_SOCK | LANDLOCK_ACCESS_FS_MAKE_FIFO |
@@ -59,7 +59,7 @@ void CloseOtherProcesses(const std::filesystem::path& home) {
     }
     if (!rules || ::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
         ::syscall(SYS_landlock_restrict_self, rules.Get(), 0) != 0) {
-        base::ThrowErrno("cannot keep a player from other processes");
+        base::ThrowErrno("cannot confine this process with Landlock");
     }
 }
 
@@ -146,7 +146,7 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
 }
 
 void EnterPlaybackSandbox(const std::filesystem::path& home, const std::vector<sock_filter>& playback_filter) {
-    CloseOtherProcesses(home);
+    ShieldOtherProcesses(home);
     Install(playback_filter);
 }
 

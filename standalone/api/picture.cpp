@@ -11,7 +11,6 @@
 #include <cstdio>
 #include <optional>
 #include <stdexcept>
-#include <string_view>
 #include <vector>
 
 #include "platform/camera/camera.h"

@@ -28,16 +28,16 @@ control::RequestRef FindPlayer(const Call& call) {
     if (key < 1) {
         throw Failure(400, "timestamp must be the number that the player was started with");
     }
-    const auto use = call.slots.FindPlayer(call.context.Session(), key);
-    if (!use) {
+    const auto player_request = call.slots.FindPlayer(call.context.Session(), key);
+    if (!player_request) {
         throw Failure(404, "this session has no such player");
     }
-    return *use;
+    return *player_request;
 }
 
 // As SlotTable::ChangePause. Throws Failure 404 when the player has ended.
-void ChangePause(const control::RequestRef& use, const std::function<void(control::Pause&)>& change) {
-    if (!control::SlotTable::ChangePause(use, change)) {
+void ChangePause(const control::RequestRef& player_request, const std::function<void(control::Pause&)>& change) {
+    if (!control::SlotTable::ChangePause(player_request, change)) {
         throw Failure(404, "the player has ended");
     }
 }
@@ -67,10 +67,10 @@ bool IsOpen(const Call& call, const control::Player& player) {
 // As FindPlayer, but waits while the player opens its recording: what is asked of it before that would be lost. Throws
 // Failure 409 when that takes too long.
 control::RequestRef AwaitPlayer(const Call& call) {
-    const control::RequestRef use = FindPlayer(call);
+    const control::RequestRef player_request = FindPlayer(call);
     const auto until = std::chrono::steady_clock::now() + kOpenLimit;
-    while (!IsOpen(call, use.slot->player)) {
-        if (use.IsOver()) {
+    while (!IsOpen(call, player_request.slot->player)) {
+        if (player_request.IsOver()) {
             throw Failure(404, "the player has ended");
         }
         if (std::chrono::steady_clock::now() > until) {
@@ -78,7 +78,7 @@ control::RequestRef AwaitPlayer(const Call& call) {
         }
         std::this_thread::sleep_for(kPoll);
     }
-    return use;
+    return player_request;
 }
 
 control::SharedLock LockPlayers(const Call& call) {
@@ -95,14 +95,14 @@ std::string SetRate(const Call& call) {
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
     }
-    const control::RequestRef use = AwaitPlayer(call);
-    const control::Player& player = use.slot->player;
+    const control::RequestRef player_request = AwaitPlayer(call);
+    const control::Player& player = player_request.slot->player;
     if (!player.takes_rate) {
         throw Failure(409, "this player does not take its rate from here");
     }
     const control::SharedLock lock = LockPlayers(call);
     bool waits = false;
-    ChangePause(use, [&waits, rate](control::Pause& pause) {
+    ChangePause(player_request, [&waits, rate](control::Pause& pause) {
         waits = pause.on && rate > 1;
         pause.resumed_rate = waits ? rate : 0;
     });
@@ -126,11 +126,11 @@ std::string GetPosition(const Call& call) {
 }
 
 // Waits until the host has told the player of its pause.
-void AwaitPause(const Call& call, const control::RequestRef& use, bool on) {
+void AwaitPause(const Call& call, const control::RequestRef& player_request, bool on) {
     call.slots.Wake();
     const auto until = std::chrono::steady_clock::now() + kSignalLimit;
-    while (use.slot->player.paused != on) {
-        if (use.IsOver() || std::chrono::steady_clock::now() > until) {
+    while (player_request.slot->player.paused != on) {
+        if (player_request.IsOver() || std::chrono::steady_clock::now() > until) {
             throw Failure(503, "the player was not reached in time", http::kRetrySoonSeconds);
         }
         std::this_thread::sleep_for(kPoll);
@@ -138,15 +138,15 @@ void AwaitPause(const Call& call, const control::RequestRef& use, bool on) {
 }
 
 // Changes the request, and the rate with it: a player that stands still has rate 1 at most.
-void RequestPause(const Call& call, const control::RequestRef& use, bool on) {
+void RequestPause(const Call& call, const control::RequestRef& player_request, bool on) {
     const control::SharedLock lock = LockPlayers(call);
     std::optional<control::ProgressFile> progress;
-    if (use.slot->player.takes_rate) {
-        progress = ProgressOf(call, use.slot->player);
+    if (player_request.slot->player.takes_rate) {
+        progress = ProgressOf(call, player_request.slot->player);
     }
     const int rate = progress ? progress->Get() : 1;
     int next = 0;  // 0: as it is
-    ChangePause(use, [&next, on, rate](control::Pause& pause) {
+    ChangePause(player_request, [&next, on, rate](control::Pause& pause) {
         pause.on = on;
         if (on) {
             next = rate > 1 ? 1 : 0;
@@ -166,12 +166,12 @@ std::string Pause(const Call& call) {
         throw Failure(400, "on must be true or false");
     }
     const bool on = asked.asBool();
-    const control::RequestRef use = AwaitPlayer(call);
-    if (!use.slot->player.can_pause) {
+    const control::RequestRef player_request = AwaitPlayer(call);
+    if (!player_request.slot->player.can_pause) {
         throw Failure(409, "this player cannot be paused");
     }
-    RequestPause(call, use, on);
-    AwaitPause(call, use, on);
+    RequestPause(call, player_request, on);
+    AwaitPause(call, player_request, on);
     Json::Value data;
     data["on"] = on;
     return SuccessAnswer(data);

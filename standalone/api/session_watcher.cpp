@@ -3,7 +3,7 @@
 
 #include <algorithm>
 #include <chrono>
-#include <optional>
+#include <set>
 #include <thread>
 
 #include "standalone/base/clock.h"

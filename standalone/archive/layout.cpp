@@ -3,7 +3,6 @@
 
 #include <array>
 #include <charconv>
-#include <cstdio>
 #include <ctime>
 
 #include "standalone/archive/mount_file.h"

@@ -2,7 +2,6 @@
 #include "standalone/archive/span_file.h"
 
 #include <charconv>
-#include <limits>
 #include <optional>
 #include <string_view>
 

@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/host_name.h"
 
+#include <array>
 #include <charconv>
-#include <string>
 
 #include <arpa/inet.h>
+#include <unistd.h>
 
 namespace lookhaven::base {
 
@@ -15,7 +16,7 @@ constexpr std::size_t kMaxLabelBytes = 63;
 constexpr std::string_view kDigits = "0123456789";
 constexpr std::string_view kLabel = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_";
 
-bool IsNumber(int family, std::string_view text) {
+bool IsIpAddress(int family, std::string_view text) {
     unsigned char address[sizeof(in6_addr)];
     return ::inet_pton(family, std::string(text).c_str(), address) == 1;
 }
@@ -35,7 +36,7 @@ bool IsPort(std::string_view text) {
 
 bool IsHost(std::string_view text) {
     if (text.find(':') != text.npos) {
-        return IsNumber(AF_INET6, text);
+        return IsIpAddress(AF_INET6, text);
     }
     if (text.size() > kMaxHostBytes) {
         return false;
@@ -52,18 +53,24 @@ bool IsHost(std::string_view text) {
         }
         rest.remove_prefix(dot + 1);
     }
-    // A name never ends in a number.
-    return last.find_first_not_of(kDigits) != last.npos || IsNumber(AF_INET, text);
+    // The last label of a host name is never all digits.
+    return last.find_first_not_of(kDigits) != last.npos || IsIpAddress(AF_INET, text);
 }
 
 bool IsHostAndPort(std::string_view text) {
     if (text.starts_with('[')) {
         const std::size_t end = text.find(']');
-        return end != text.npos && IsNumber(AF_INET6, text.substr(1, end - 1)) &&
+        return end != text.npos && IsIpAddress(AF_INET6, text.substr(1, end - 1)) &&
                (end + 1 == text.size() || (text[end + 1] == ':' && IsPort(text.substr(end + 2))));
     }
     const std::size_t colon = text.find(':');
     return IsHost(text.substr(0, colon)) && (colon == text.npos || IsPort(text.substr(colon + 1)));
+}
+
+std::string OwnHostName() {
+    std::array<char, 256> name{};
+    ::gethostname(name.data(), name.size() - 1);
+    return name.data();
 }
 
 }  // namespace lookhaven::base

@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What may name a host in an address.
+// What may name a host in an address, and what this one is called.
 #pragma once
 
+#include <string>
 #include <string_view>
 
 namespace lookhaven::base {
@@ -13,5 +14,8 @@ bool IsHost(std::string_view text);
 
 // "host", "host:8080", "[2001:db8::1]:8080": a host, and a port from 1 to 65535 where one is given.
 bool IsHostAndPort(std::string_view text);
+
+// This host's name, as the system has it.
+std::string OwnHostName();
 
 }  // namespace lookhaven::base

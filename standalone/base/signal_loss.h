@@ -14,11 +14,11 @@ namespace lookhaven::base {
 enum class SignalLoss : std::uint8_t {
     kOther,
     kRefused,        // nothing listens at its address and port
-    kUnreachable,    // no way leads to its address
+    kUnreachable,    // no route to its address, or no answer from it
     kUnknownHost,    // its host name cannot be resolved
     kWrongPassword,  // it does not accept the account and password
     kCertificate,    // its TLS certificate is not trusted
-    kStalled,        // it is there, or silent, and sends no picture in time
+    kStalled,        // connected, but no picture came in time
 };
 
 constexpr std::array<std::string_view, 7> kSignalLossNames{

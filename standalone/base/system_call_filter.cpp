@@ -37,7 +37,8 @@ SystemCallFilter::SystemCallFilter(DefaultAction action)
     Check(::seccomp_attr_set(filter_.get(), SCMP_FLTATR_ACT_BADARCH, SCMP_ACT_KILL_PROCESS));
 }
 
-void SystemCallFilter::AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions) {
+void SystemCallFilter::AddException(std::initializer_list<int> calls,
+                                    std::initializer_list<ArgumentCondition> conditions) {
     std::vector<scmp_arg_cmp> compared;
     for (const auto& [argument, value, mask, negated] : conditions) {
         const auto wanted = static_cast<std::uint32_t>(value);

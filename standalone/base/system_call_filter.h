@@ -16,17 +16,18 @@
 namespace lookhaven::base {
 
 // The lower 32 bits of an argument, masked, have that value; or, negated, the whole argument has another one.
-struct ArgumentIs {
+struct ArgumentCondition {
     unsigned argument;
     int value;
     int mask = ~0;
     bool negated = false;
 };
-constexpr ArgumentIs ArgumentIsNot(unsigned argument, int value) {
+constexpr ArgumentCondition ArgumentIsNot(unsigned argument, int value) {
     return {argument, value, ~0, true};
 }
 
-// As a value: the id of the process that installs it, whoever made the filter. No process has this one.
+// As a value: the id of the process that installs it, whoever made the filter. No process has this one. Compare without
+// a mask; any other use of this value in a filter is replaced, too.
 constexpr int kOwnProcess = 0x7fffff1d;
 
 class SystemCallFilter {
@@ -37,7 +38,7 @@ class SystemCallFilter {
     explicit SystemCallFilter(DefaultAction action);
     // The calls, which SCMP_SYS names, are an exception from that; with conditions, when all of them hold. A call may
     // be named several times.
-    void AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentIs> conditions = {});
+    void AddException(std::initializer_list<int> calls, std::initializer_list<ArgumentCondition> conditions = {});
 
     // For InstallSystemCallFilter, in any number of processes.
     std::vector<sock_filter> Program() const;

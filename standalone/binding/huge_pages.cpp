@@ -15,7 +15,7 @@ namespace {
 
 constexpr int kHeapBytes = 64 << 20;          // address space; memory only where it is used
 constexpr std::size_t kProbeBytes = 1 << 20;  // more than a heap of a few requests has free
-constexpr std::uintptr_t kLargePageBytes = 2 << 20;
+constexpr std::uintptr_t kHugePageBytes = 2 << 20;
 
 }  // namespace
 
@@ -29,7 +29,7 @@ void PrepareForManyObjects() {
     ::mallopt(M_TRIM_THRESHOLD, 2 * kHeapBytes);
     ::mallopt(M_TOP_PAD, kHeapBytes);
     void* probe = std::malloc(kProbeBytes);
-    const auto begin = (reinterpret_cast<std::uintptr_t>(probe) + kLargePageBytes - 1) & ~(kLargePageBytes - 1);
+    const auto begin = (reinterpret_cast<std::uintptr_t>(probe) + kHugePageBytes - 1) & ~(kHugePageBytes - 1);
     const auto end = reinterpret_cast<std::uintptr_t>(::sbrk(0));
     if (probe != nullptr && begin < end && end - begin <= 2 * std::uintptr_t{kHeapBytes}) {
         ::madvise(reinterpret_cast<void*>(begin), end - begin, MADV_HUGEPAGE);

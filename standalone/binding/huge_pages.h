@@ -5,9 +5,9 @@
 
 namespace lookhaven::binding {
 
-// Lets this process's heap grow into large pages from here on. A list of thousands of events fills tens of megabytes
+// Lets this process's heap grow into huge pages from here on. A list of thousands of events fills tens of megabytes
 // once, and a page fault for every 4 KiB of them costs more than the list itself. Not for streams: the first object
-// takes a whole large page. Does nothing where the system has none.
+// takes a whole huge page. Does nothing where the system has none.
 void PrepareForManyObjects();
 
 }  // namespace lookhaven::binding

@@ -9,7 +9,6 @@
 #include <sys/ioctl.h>
 #include <sys/mman.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
 #include "standalone/base/system_call_filter.h"
 #include "standalone/camera/sanitizers.h"
@@ -79,7 +78,7 @@ bool FilterSystemCalls() {
     for (const int command : {FIONREAD, FIONBIO}) {
         filter.AddException({SCMP_SYS(ioctl)}, {{1, command}});
     }
-    filter.AddException({SCMP_SYS(tgkill)}, {{0, ::getpid()}});  // abort
+    filter.AddException({SCMP_SYS(tgkill)}, {{0, base::kOwnProcess}});  // abort
     return base::InstallSystemCallFilter(filter.Program());
 }
 

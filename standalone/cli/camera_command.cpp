@@ -13,9 +13,9 @@
 #include "standalone/cli/units.h"
 #include "standalone/media/probe.h"
 #include "standalone/pattern/pattern_source.h"
-#include "standalone/store/change_together.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/text.h"
+#include "standalone/store/transaction.h"
 
 namespace lookhaven::cli {
 
@@ -151,7 +151,7 @@ void Add(const Console& console, const Request& request) {
     ProbeMissing(camera, request, credentials);
     RecordingPlan plan;
     request.recording.ApplyTo(plan);
-    store::ChangeTogether(store, [&] {
+    store::InTransaction(store, [&] {
         camera.id = cameras.Add(camera);
         if (credentials) {
             cameras.SetCredentials(camera.id, credentials);
@@ -175,7 +175,7 @@ void Change(const Console& console, const Request& request) {
     }
     RecordingPlan plan = RecordingPlans(store).Find(camera.id);
     request.recording.ApplyTo(plan);
-    store::ChangeTogether(store, [&] {
+    store::InTransaction(store, [&] {
         SetPlan(store, camera.id, request, plan);
         cameras.Update(camera);
         if (request.account) {

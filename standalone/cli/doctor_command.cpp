@@ -2,6 +2,7 @@
 //
 // lookhaven doctor: looks at every part of a running installation and says what to do.
 #include <algorithm>
+#include <exception>
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -41,6 +42,15 @@ void RequireOwner(const base::Installation& installation) {
     }
 }
 
+doctor::Findings Run(const Check& check, const base::Installation& installation) {
+    try {
+        return check.run(installation);
+    } catch (const std::exception& error) {
+        return {
+            {Concat(check.name, " cannot be checked: ", error.what()), "correct that and run lookhaven doctor again"}};
+    }
+}
+
 void Examine(const Console& console) {
     const base::Installation installation = console.Installation();
     RequireOwner(installation);
@@ -48,7 +58,7 @@ void Examine(const Console& console) {
     std::string text;
     std::size_t count = 0;
     for (const Check& check : kChecks) {
-        const doctor::Findings findings = check.run(installation);
+        const doctor::Findings findings = Run(check, installation);
         Json::Value list = Json::arrayValue;
         const auto faults = std::ranges::count(findings, doctor::Severity::kFault, &doctor::Finding::severity);
         text += Concat(findings.empty() ? "ok       " : faults == 0 ? "note     " : "problem  ", check.name, "\n");

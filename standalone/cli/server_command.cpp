@@ -64,12 +64,6 @@ constexpr Column kCameraColumns[] = {
 
 constexpr Column kRefreshColumns[] = {{"id", "id"}, {"name", "name"}, {"new cameras", "new"}};
 
-std::string HostName() {
-    char name[256] = "";
-    ::gethostname(name, sizeof name - 1);
-    return name;
-}
-
 std::vector<RemoteCamera> OwnCameras(store::Store& store) {
     std::vector<RemoteCamera> cameras;
     for (const store::Camera& camera : store::Cameras(store).List()) {
@@ -81,9 +75,9 @@ std::vector<RemoteCamera> OwnCameras(store::Store& store) {
 
 // Only the line itself goes to standard output, so that it can be redirected.
 void Pair(const Console& console, const Request& request) {
-    const std::string address = request.address.empty() ? HostName() : request.address;
+    const std::string address = request.address.empty() ? base::OwnHostName() : request.address;
     if (!base::IsHost(address)) {
-        throw Failure(kDataError, "the address ", address, " is neither a host name nor the number of a host");
+        throw Failure(kDataError, "the address ", address, " is neither a host name nor an IP address");
     }
     store::Store store = console.OpenStore();
     const std::string certificate =
@@ -111,12 +105,12 @@ std::string ReadPairText() {
     return line;
 }
 
-// Empty when the host answers; else why it does not and what to do, without which the pairing is of no use.
-std::string Trial(const RecordingServer& server, const std::string& secret) {
+// Why the host does not answer and what to do about it, as lines to append to an answer; empty when it answers.
+std::string ConnectionProblem(const RecordingServer& server, const std::string& secret) {
     const std::string failure = AskPairedHost(server, secret).failure;
     return failure.empty() ? ""
                            : Concat("\nIt does not answer at ", server.address, " port ", server.port, ": ", failure,
-                                    ".\nThe pairing is kept; where address or port is another: lookhaven server set ",
+                                    ".\nThe pairing is kept; if its address or port differs: lookhaven server set ",
                                     server.id, " --address ADDRESS --port PORT");
 }
 
@@ -130,11 +124,11 @@ void Add(const Console& console, const Request& request) {
                            .port = offer.port,
                            .certificate = remote::CertificatesIn(offer.certificate)};
     server.id = servers.Pair(server, offer.secret, offer.cameras);
-    const std::string trouble = Trial(server, offer.secret);
+    const std::string problem = ConnectionProblem(server, offer.secret);
     Json::Value data = ToData(server);
-    data["answers"] = trouble.empty();
+    data["answers"] = problem.empty();
     console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", offer.cameras.size(),
-                   " cameras.", trouble);
+                   " cameras.", problem);
 }
 
 // Secret, certificate and cameras stay.
@@ -148,10 +142,10 @@ void Change(const Console& console, const Request& request) {
     server.port = request.change.port.value_or(server.port);
     servers.Update(server);
     const bool is_tried = server.enabled && !server.address.empty();
-    const std::string trouble = is_tried ? Trial(server, servers.FindSecret(server.id)) : "";
+    const std::string problem = is_tried ? ConnectionProblem(server, servers.FindSecret(server.id)) : "";
     Json::Value data = ToData(server);
-    data["answers"] = is_tried && trouble.empty();
-    console.Answer(data, "Changed server ", server.name, ".", trouble);
+    data["answers"] = is_tried && problem.empty();
+    console.Answer(data, "Changed server ", server.name, ".", problem);
 }
 
 void List(const Console& console) {

@@ -166,7 +166,7 @@ class SlotTable {
     // How many other requests there are that count.
     std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;
 
-    // Those that have been taken: what is looked at costs each process a page.
+    // Those that have been taken: reading an unused slot would cost each process a page.
     std::span<Slot> Used() const;
     std::size_t SizeBytes() const;
 

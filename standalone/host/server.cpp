@@ -2,7 +2,6 @@
 #include "standalone/host/server.h"
 
 #include <algorithm>
-#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstring>
@@ -16,6 +15,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
+#include "standalone/base/text.h"
 #include "standalone/control/player_file.h"
 #include "standalone/http/answer.h"
 
@@ -47,7 +47,7 @@ bool MayHaveSession(const http::Request& request) {
     constexpr int kSecretDigits = 64;
     int digits = 0;
     for (const char each : request.Header("HTTP_COOKIE")) {
-        digits = std::isxdigit(static_cast<unsigned char>(each)) != 0 ? digits + 1 : 0;
+        digits = base::IsHex({&each, 1}, 1) ? digits + 1 : 0;
         if (digits == kSecretDigits) {
             return true;
         }

@@ -21,7 +21,7 @@ constexpr std::array<std::pair<RecordingState, const char*>, 8> kNames{{
     {RecordingState::kDiskFails, "disk-fails"},
     {RecordingState::kMountGone, "mount-gone"},
     {RecordingState::kNoMount, "no-mount"},
-    {RecordingState::kNoEventId, "no-number"},
+    {RecordingState::kNoEventId, "no-event-id"},
     {RecordingState::kNoSignal, "no-signal"},
 }};
 

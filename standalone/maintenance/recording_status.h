@@ -32,7 +32,7 @@ enum class RecordingState {
     kNoSignal,   // no picture comes, whatever is to be recorded
 };
 
-// "ready", "recording", "disk-full", "disk-fails", "mount-gone", "no-mount", "no-number", "no-signal"
+// "ready", "recording", "disk-full", "disk-fails", "mount-gone", "no-mount", "no-event-id", "no-signal"
 const char* NameOf(RecordingState state);
 
 struct RecordingStatus {

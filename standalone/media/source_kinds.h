@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The kinds of camera source. To add one: write its class in a file of its own (rtsp_source.cpp shows how little it
-// needs), declare its SourceOpener here, and name it in source_kinds.cpp.
+// needs), declare its SourceOpener here, and name it in source_kinds.cpp. A kind that begins with "…://" runs confined
+// in lookhaven-camera (camera/isolated_source.cpp); see docs/design/cameras.md.
 #pragma once
 
 #include <memory>

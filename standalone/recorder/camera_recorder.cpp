@@ -21,7 +21,7 @@ constexpr std::int64_t kTryAgainUs = 1'000'000;
 // Events that begin for a camera's times alone: so many at once, and then one in each interval.
 constexpr std::int64_t kCutsAtOnce = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
-constexpr std::int64_t kMaxDistanceUs = 30'000'000;  // of pictures; more is a camera that was away
+constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
 // Split here even where no key frame comes or the next event has no number.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
 
@@ -62,7 +62,7 @@ std::int64_t CameraRecorder::IntervalAfter(const Frame& frame) {
     }
     const std::int64_t before_us = std::exchange(previous_us_, frame.timestamp_us);
     const std::int64_t interval_us =
-        before_us == 0 ? 0 : std::clamp<std::int64_t>(frame.timestamp_us - before_us, 0, kMaxDistanceUs);
+        before_us == 0 ? 0 : std::clamp<std::int64_t>(frame.timestamp_us - before_us, 0, kMaxIntervalUs);
     return interval_us_ + (interval_us - interval_us_) / 4;
 }
 

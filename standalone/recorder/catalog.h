@@ -15,7 +15,6 @@
 #include <mutex>
 #include <optional>
 #include <string>
-#include <vector>
 
 #include "standalone/recorder/store_thread.h"
 #include "standalone/recorder/stream_worker.h"
@@ -34,7 +33,7 @@ struct CameraPlan {
     int mount_id = 0;  // 0: there is none to record to
     std::filesystem::path mount;
     std::string installation;                      // whose mounts are recorded to
-    int live_stream = 0;                           // the profile that the live view shows, and …
+    int live_profile = 0;                          // the profile that the live view shows, and …
     base::Codec video_type = base::Codec::kMjpeg;  // … what the store says that it sends
 };
 

@@ -130,13 +130,13 @@ std::map<int, CameraSignal> Supervisor::Signals() const {
     return signals;
 }
 
-// A camera may be set up anew, or exchanged, behind the owner's back.
+// A camera may be set up anew, or exchanged, without lookhaven being told.
 void Supervisor::CorrectVideoTypes() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     for (const auto& [stream, worker] : workers_) {
         const auto plan = catalog->cameras.find(stream.camera);
         const std::optional<base::Codec> codec = worker->Signal().codec;
-        if (codec && plan != catalog->cameras.end() && plan->second.live_stream == stream.stream &&
+        if (codec && plan != catalog->cameras.end() && plan->second.live_profile == stream.stream &&
             plan->second.video_type != *codec) {
             catalog_.CorrectVideoType(stream.camera, *codec);
         }

@@ -1,11 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/recorder_lease.h"
 
-#include <array>
 #include <tuple>
 
-#include <unistd.h>
-
+#include "standalone/base/host_name.h"
 #include "standalone/store/connection.h"
 
 namespace lookhaven::store {
@@ -18,9 +16,7 @@ struct Mapping<LeaseState> {
 };
 
 std::string RecorderName(const base::Installation& installation) {
-    std::array<char, 256> host{};
-    ::gethostname(host.data(), host.size() - 1);
-    return installation.Home().string() + " on " + host.data();
+    return installation.Home().string() + " on " + base::OwnHostName();
 }
 
 LeaseState RecorderLease::Current() {

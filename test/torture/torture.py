@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
-"""Breaks a running installation again and again, at random, and looks each time for what that has cost: footage, a viewer's
-connection, processes, descriptors, shared memory, files. Prints what was done and lost; ends with 1 at the first break of a
+"""Breaks a running installation again and again, at random, and checks each time what was lost: footage, a viewer's
+connection, processes, descriptors, shared memory, files. Prints what was done and lost; ends with 1 at the first broken
 promise, and keeps the state folder then."""
 
 import argparse
@@ -168,14 +168,14 @@ class Torture:
 
     def unplug_disk(self):
         """Away, with all that is on it, and another one in its place."""
-        subprocess.run(["mount", "--move", self.disk, self._drawer()], check=True)
+        subprocess.run(["mount", "--move", self.disk, self._parking()], check=True)
         time.sleep(random.uniform(0.5, 3))
-        subprocess.run(["mount", "--move", self._drawer(), self.disk], check=True)
+        subprocess.run(["mount", "--move", self._parking(), self.disk], check=True)
 
-    def _drawer(self):
-        drawer = self.disk.with_name("drawer")
-        drawer.mkdir(exist_ok=True)
-        return drawer
+    def _parking(self):
+        parking = self.disk.with_name("parking")
+        parking.mkdir(exist_ok=True)
+        return parking
 
     # --- what must hold
 
@@ -202,7 +202,7 @@ class Torture:
 
     def close(self):
         self.watcher.close()
-        for folder in (self.disk, self._drawer()):
+        for folder in (self.disk, self._parking()):
             if os.path.ismount(folder):
                 subprocess.run(["umount", "--lazy", folder], check=True)
 

@@ -34,7 +34,7 @@ struct ProbeHandler : LHHandlerBase<ProbeHandler> {
 const Calls kSession = {"IsAuthorized()", "HasAppPriv(VEXO.VDX.Lookhaven)", "IsAdmin()", "GetLoginUserName()"};
 const Calls kAppPriv = {kSession.begin(), kSession.begin() + 2};
 const Calls kAdmin = {kSession.begin(), kSession.begin() + 3};
-const Calls kPeer = {"IsLHRunning()", "GetParam(isCrossSite,0)", "GetParam(client,\"\")"};
+const Calls kPairedHost = {"IsLHRunning()", "GetParam(isCrossSite,0)", "GetParam(client,\"\")"};
 const Calls kPair = {"GetParam(cookie,\"FailedCookie\")", "GetCookie(timestamp,FailedTiemstamp)"};
 const Calls kNoSession = {"IsAuthorized()"};
 
@@ -49,7 +49,7 @@ struct AdmissionRow {
     Calls calls;
 };
 
-void AsPeer(ScriptedPlatform& p, const char* client) {
+void AsPairedHost(ScriptedPlatform& p, const char* client) {
     p.params = {{"client", client}, {"cookie", "c"}};
     p.cookies["timestamp"] = "t";
     p.pair_matches = true;
@@ -62,25 +62,26 @@ const AdmissionRow kAdmission[] = {
     {"the user's privilege", [](auto& p) { p.is_authorized = p.has_user_priv = true; }, true,
      kSession + UserPriv("eve")},
     {"session without rights", [](auto& p) { p.is_authorized = true, p.user_name = "lookhaven"; }, false,
-     kSession + UserPriv("lookhaven") + kPeer},
-    {"session without rights, but a peer", [](auto& p) { p.is_authorized = true, AsPeer(p, "MX510LQ"); }, true,
-     kSession + UserPriv("eve") + kPeer + kPair + Calls{"IsAuthPairMatch(c,t)"}},
+     kSession + UserPriv("lookhaven") + kPairedHost},
+    {"session without rights, but a paired host", [](auto& p) { p.is_authorized = true, AsPairedHost(p, "MX510LQ"); },
+     true, kSession + UserPriv("eve") + kPairedHost + kPair + Calls{"IsAuthPairMatch(c,t)"}},
     {"rights without a session", [](auto& p) { p.has_app_priv = p.is_admin = p.has_user_priv = true; }, false,
-     kNoSession + kPeer},
-    {"client in other letters", [](auto& p) { AsPeer(p, "nvr"); }, false, kNoSession + kPeer},
-    {"service down", [](auto& p) { AsPeer(p, "NVR"), p.is_running = false; }, false, kNoSession + kPeer},
-    {"empty cookie", [](auto& p) { AsPeer(p, "NVR"), p.params["cookie"] = ""; }, false, kNoSession + kPeer + kPair},
-    {"empty timestamp", [](auto& p) { AsPeer(p, "NVR"), p.cookies["timestamp"] = ""; }, false,
-     kNoSession + kPeer + kPair},
+     kNoSession + kPairedHost},
+    {"client in other letters", [](auto& p) { AsPairedHost(p, "nvr"); }, false, kNoSession + kPairedHost},
+    {"service down", [](auto& p) { AsPairedHost(p, "NVR"), p.is_running = false; }, false, kNoSession + kPairedHost},
+    {"empty cookie", [](auto& p) { AsPairedHost(p, "NVR"), p.params["cookie"] = ""; }, false,
+     kNoSession + kPairedHost + kPair},
+    {"empty timestamp", [](auto& p) { AsPairedHost(p, "NVR"), p.cookies["timestamp"] = ""; }, false,
+     kNoSession + kPairedHost + kPair},
     {"no cookies at all", [](auto& p) { p.params["client"] = "NVR"; }, false,
-     kNoSession + kPeer + kPair + Calls{"IsAuthPairMatch(FailedCookie,FailedTiemstamp)"}},
-    {"across sites", [](auto& p) { AsPeer(p, "REC_SERVER"), p.params["isCrossSite"] = 1; }, true,
-     kNoSession + kPeer + kPair + Calls{"SlaveHxAuthentication()", "IsAuthByPairMatch(c,t)"}},
+     kNoSession + kPairedHost + kPair + Calls{"IsAuthPairMatch(FailedCookie,FailedTiemstamp)"}},
+    {"across sites", [](auto& p) { AsPairedHost(p, "REC_SERVER"), p.params["isCrossSite"] = 1; }, true,
+     kNoSession + kPairedHost + kPair + Calls{"SlaveHxAuthentication()", "IsAuthByPairMatch(c,t)"}},
     {"across sites, no match",
-     [](auto& p) { AsPeer(p, "REC_SERVER"), p.params["isCrossSite"] = 1, p.pair_matches = false; }, false,
-     kNoSession + kPeer + kPair + Calls{"SlaveHxAuthentication()", "IsAuthByPairMatch(c,t)"}},
-    {"isCrossSite 2", [](auto& p) { AsPeer(p, "NVR"), p.params["isCrossSite"] = 2; }, true,
-     kNoSession + kPeer + kPair + Calls{"IsAuthPairMatch(c,t)"}},
+     [](auto& p) { AsPairedHost(p, "REC_SERVER"), p.params["isCrossSite"] = 1, p.pair_matches = false; }, false,
+     kNoSession + kPairedHost + kPair + Calls{"SlaveHxAuthentication()", "IsAuthByPairMatch(c,t)"}},
+    {"isCrossSite 2", [](auto& p) { AsPairedHost(p, "NVR"), p.params["isCrossSite"] = 2; }, true,
+     kNoSession + kPairedHost + kPair + Calls{"IsAuthPairMatch(c,t)"}},
 };
 
 TEST(Authenticate, AsksInOrderAndNoMoreThanItNeeds) {
@@ -95,7 +96,7 @@ TEST(Authenticate, AsksInOrderAndNoMoreThanItNeeds) {
     }
 }
 
-TEST(PrivProfile, IsLoadedOnceForTheLoginOrForAPeer) {
+TEST(PrivProfile, IsLoadedOnceForTheLoginOrForAPairedHost) {
     for (const bool is_paired_host : {false, true}) {
         ScriptedPlatform platform;
         platform.params["privData"]["privilege"] = 3;
@@ -198,7 +199,7 @@ TEST(Table, RowsReachTheirMethodsAndEndInZeros) {
         {player, "PlayMjpegEvent", ProcessPlayEvent, play + Calls{"GetParam(mountid,\"0\")"}},
         {player, "PlayMjpegEventNoFrameId", ProcessPlayEvent, play + Calls{"GetParam(mountid,0)"}},
         {player, "LoadCamera", ProcessLoadCamera, {"GetAPIMethod()", "GetParam(camera,0)"}},
-        {player + ".LiveviewSrc", "Play", ProcessLiveviewSrc, kNoSession + kPeer},
+        {player + ".LiveviewSrc", "Play", ProcessLiveviewSrc, kNoSession + kPairedHost},
     };
     const APIRow* found = GetAPITable();
     EXPECT_EQ(found, gTable);

@@ -3,7 +3,7 @@
 // The web API as the client uses it: typed answers, and for each failure one sentence for the user.
 
 import { Deadline } from "./deadline";
-import { Outages } from "./outages";
+import { SignalLosses } from "./signal_losses";
 
 export interface Account {
   account: string;
@@ -92,7 +92,7 @@ async function failureOf(answer: Response): Promise<ServerError> {
 
 export class Server {
   /** As of the last refresh. */
-  readonly outages = new Outages(this);
+  readonly signalLosses = new SignalLosses(this);
   readonly #onSessionEnd: () => void;
 
   /** `onSessionEnd` is called whenever an answer says that there is no session (any more). */

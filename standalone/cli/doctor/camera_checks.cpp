@@ -2,7 +2,10 @@
 //
 // Cameras: whether they send pictures, whether these are recorded, and the shared memory that they pass through.
 #include <algorithm>
+#include <exception>
+#include <optional>
 
+#include "standalone/cli/camera_options.h"
 #include "standalone/cli/console.h"
 #include "standalone/cli/doctor/checks.h"
 #include "standalone/cli/units.h"
@@ -23,7 +26,23 @@ std::string TitleOf(const RecordingStatus& status) {
     return Concat("camera ", status.camera, " (", status.camera_name, ")");
 }
 
-std::string RemedyOf(const RecordingStatus& status) {
+// The option for the address of the profile that the live view shows.
+std::string LiveSourceOption(const base::Installation& installation, int camera_id) {
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        const std::optional<store::Camera> camera = store::Cameras(store).Find(camera_id);
+        for (const auto& [name, number] : ProfileNames()) {
+            if (camera && number == camera->live_profile && number != 0) {
+                return "--" + name + "-source";
+            }
+        }
+    } catch (const std::exception&) {
+        // CheckStore reports it
+    }
+    return "--source";
+}
+
+std::string RemedyOf(const base::Installation& installation, const RecordingStatus& status) {
     switch (status.loss) {
     case SignalLoss::kWrongPassword:
         return Concat("lookhaven camera set ", status.camera, " --account ACCOUNT");
@@ -33,17 +52,17 @@ std::string RemedyOf(const RecordingStatus& status) {
     case SignalLoss::kRefused:
     case SignalLoss::kUnknownHost:
     case SignalLoss::kUnreachable:
-        return Concat("switch the camera on, or, where its address or port is another: lookhaven camera set ",
-                      status.camera, " --source ADDRESS");
+        return Concat("switch the camera on, or, if its address or port has changed: lookhaven camera set ",
+                      status.camera, " ", LiveSourceOption(installation, status.camera), " ADDRESS");
     default:
         return Concat("restart the camera, and see what it sends: lookhaven camera probe ", status.camera);
     }
 }
 
-Finding NoSignal(const RecordingStatus& status) {
-    return {Concat(TitleOf(status), " sends no picture since ", FormatMoment(status.lost_since_s), ": ",
+Finding NoSignal(const base::Installation& installation, const RecordingStatus& status) {
+    return {Concat(TitleOf(status), " has sent no picture since ", FormatMoment(status.lost_since_s), ": ",
                    base::NameOf(status.loss), " (", status.loss_reason, ")"),
-            RemedyOf(status)};
+            RemedyOf(installation, status)};
 }
 
 bool IsPaused(RecordingState state) {
@@ -82,13 +101,13 @@ Findings CheckRecordings(const base::Installation& installation) {
     Findings findings;
     for (const RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
         if (status.lost_since_s > 0) {
-            findings.push_back(NoSignal(status));
+            findings.push_back(NoSignal(installation, status));
         }
         if (IsPaused(status.state)) {
             const bool lacks_event_id = status.state == RecordingState::kNoEventId;
             findings.push_back({Concat(TitleOf(status), " is not recorded: ", maintenance::NameOf(status.state)),
                                 lacks_event_id
-                                    ? "mend the store, which gives out event ids; recording then resumes by itself"
+                                    ? "repair the store, which gives out event ids; recording then resumes by itself"
                                     : "check that its mount is enabled and in its place with lookhaven mount "
                                       "list; recording then resumes by itself"});
         }

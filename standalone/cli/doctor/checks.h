@@ -3,9 +3,11 @@
 // What lookhaven doctor looks at: a function for each part of an installation, in the file of its kind.
 //
 // Invariants    (1) A check judges as the user who runs it, who must be the one that runs the server.
-//               (2) It changes nothing and throws nothing. Where another check tells the cause, it finds nothing.
+//               (2) It changes nothing. Where another check tells the cause, it finds nothing. What it throws, a
+//               std::exception, is reported as a fault: that part cannot be checked.
 //               (3) A remedy that begins with a command's name is that command line, ready to be run; "as root: " may
-//               stand before it, and words in capitals are for the owner to fill in. Any other is for hands.
+//               stand before it, and words in capitals are for the owner to fill in. Any other describes what a person
+//               must do.
 #pragma once
 
 #include <string>

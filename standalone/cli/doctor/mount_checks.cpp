@@ -8,7 +8,6 @@
 #include <map>
 #include <system_error>
 
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/cli/console.h"
@@ -97,7 +96,7 @@ Findings CheckEnabled(store::Store& store, const store::Mount& mount) {
 }
 
 // Cameras that are to be recorded to each mount.
-std::map<int, int> CamerasOf(store::Store& store) {
+std::map<int, int> CountCamerasByMount(store::Store& store) {
     std::map<int, int> cameras;
     const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(store).List();
     store::Mounts mounts(store);
@@ -127,7 +126,7 @@ Findings CheckMounts(const base::Installation& installation) {
         if (mounts.empty()) {
             return {{"there is no mount to record to", "lookhaven init"}};
         }
-        std::map<int, int> cameras = CamerasOf(store);
+        std::map<int, int> cameras = CountCamerasByMount(store);
         for (const store::Mount& mount : mounts) {
             try {
                 std::ranges::move(mount.enabled ? CheckEnabled(store, mount) : CheckDisabled(mount, cameras[mount.id]),

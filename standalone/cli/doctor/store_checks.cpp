@@ -14,9 +14,9 @@ namespace lookhaven::cli::doctor {
 
 namespace {
 
-constexpr const char* kRestore = "end the server, put a backup in the place of the store, start the server and run "
-                                 "lookhaven verify --repair, which takes"
-                                 " back what was recorded since";
+constexpr const char* kRestore =
+    "stop the server, replace the store with a backup, start the server and run lookhaven verify --repair, "
+    "which imports what was recorded since";
 
 // What SQLite says of a file that it cannot understand.
 bool IsMalformed(const std::string& message) {

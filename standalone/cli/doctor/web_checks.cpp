@@ -5,11 +5,9 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <regex>
 
 #include <netdb.h>
-#include <poll.h>
 #include <sys/socket.h>
 
 #include "standalone/base/clock.h"
@@ -110,8 +108,8 @@ Findings CheckCertificate(const base::Installation& installation) {
                    : Findings{{"there is no certificate at " + path.string(), "restart the server, which makes one"}};
     }
     const std::string remedy =
-        "put another certificate.pem and key.pem there and restart the server; a self-signed one that"
-        " script/server made it replaces by itself";
+        "put a valid certificate.pem and key.pem there and restart the server; a self-signed one that "
+        "script/server made is renewed when it restarts";
     try {
         const std::int64_t end_s = remote::CertificateEnd(base::ReadFile(path));
         const std::int64_t left_s = end_s - base::WallSeconds();
@@ -135,7 +133,7 @@ Findings CheckPairedHosts(const base::Installation& installation) {
                 findings.push_back(
                     {Concat("the paired host ", answer.server.name, " at ", answer.server.address, " port ",
                             answer.server.port, " fails: ", answer.failure),
-                     Concat("mend that, or say where it is now: lookhaven server set ", answer.server.id,
+                     Concat("correct that, or give its new address: lookhaven server set ", answer.server.id,
                             " --address ADDRESS --port PORT; to leave it alone for now: lookhaven server set ",
                             answer.server.id, " --disable")});
             }

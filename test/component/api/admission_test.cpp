@@ -109,7 +109,7 @@ TEST_F(Admission, LogInsAndRefusalsAreLoggedCleanly) {
     EXPECT_LT(refusal.size(), 160U);
 }
 
-TEST(Peers, AreOneUserTogether) {
+TEST(PairedHosts, AreOneUserTogether) {
     const HostUnderTest host({"--max-requests-per-user", "2"});
     store::Store records = store::Store::Open(host.Home().StoreUrl());
     const std::string now = std::to_string(base::WallSeconds());

@@ -173,7 +173,7 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
         {"malformed store",
          Shell("cp " + database + " " + database + "-backup && printf nothing | dd conv=notrunc of=" + database +
                " 2>/dev/null"),
-         "do: end the server, put a backup", Shell("cat " + database + "-backup > " + database)},
+         "do: stop the server, replace the store", Shell("cat " + database + "-backup > " + database)},
         {"newer store", Sql("update schema_version set version = 99"), "update Lookhaven",
          Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))},
         {"no manager", Sql("update users set privilege = 2 where name = 'admin'"), "no account may manage"},
@@ -205,7 +205,7 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
              store::Events(store).AddAll(std::vector{event});
          },
          "above its limit", [&] { EXPECT_EQ(Run("mount set 2 --limit 1G").code, 0); }},
-        {"camera that is down", Tell({refuses}), "(Entrance) sends no picture since ",
+        {"camera that is down", Tell({refuses}), "(Entrance) has sent no picture since ",
          [&] {
              EXPECT_EQ(Run("camera set 1 --account root", "camera-s3cret\n").code, 0);
              Tell({})();

@@ -46,7 +46,7 @@ TEST_P(AccountTest, NamesThatCouldMisleadAreRefused) {
     EXPECT_EQ(users_.List().size(), 4U);
 }
 
-TEST_P(AccountTest, IdsAreNeverGivenAgainAndNeverThePeers) {
+TEST_P(AccountTest, IdsAreNeverGivenAgainAndNeverThePairedHosts) {
     Force("update counters set value = 1022 where name = 'user'");
     EXPECT_EQ(users_.Add("a", kPassword, Privilege::kViewer).id, 1023);
     EXPECT_EQ(users_.Add("b", kPassword, Privilege::kViewer).id, 1025);

@@ -54,7 +54,7 @@ export class LargeView {
     );
     this.#picture = new LivePicture(
       () => this.#source.unplayable,
-      () => server.outages.of(camera),
+      () => server.signalLosses.of(camera),
       () => this.#showState(),
       true,
     );

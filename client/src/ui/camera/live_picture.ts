@@ -5,7 +5,7 @@
 import { Feed } from "../../live/feed";
 import type { SignalState } from "../../live/signal_state";
 import type { Unplayable } from "../../live/unplayable";
-import type { Outage } from "../../wire/outages";
+import type { SignalLoss } from "../../wire/signal_losses";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { signalText } from "../widgets/text";
@@ -22,7 +22,7 @@ export class LivePicture {
   readonly feed: Feed;
   readonly root: HTMLElement;
   readonly #unplayable: () => Unplayable | null;
-  readonly #outage: () => Outage | null;
+  readonly #signalLoss: () => SignalLoss | null;
   readonly #changed: () => void;
   readonly #canLink: boolean;
   readonly #sentence = element("p", { class: "message-sentence" });
@@ -36,17 +36,18 @@ export class LivePicture {
   #framesPerSecond = 0;
 
   /**
-   * `unplayable` says why still pictures are shown, `outage` why the camera sends none; `changed` is called after the state on the screen changed: call
-   * `refresh` once when you are ready for it. Links are shown where `canLink`, which is not so within a button.
+   * `unplayable` says why still pictures are shown, `signalLoss` why the camera sends none; `changed` is called after
+   * the state on the screen changed: call `refresh` once when you are ready for it. Links are shown where `canLink`,
+   * which is not so within a button.
    */
   constructor(
     unplayable: () => Unplayable | null,
-    outage: () => Outage | null,
+    signalLoss: () => SignalLoss | null,
     changed: () => void,
     canLink: boolean,
   ) {
     this.#unplayable = unplayable;
-    this.#outage = outage;
+    this.#signalLoss = signalLoss;
     this.#canLink = canLink;
     this.#changed = changed;
     this.feed = new Feed(
@@ -72,8 +73,8 @@ export class LivePicture {
     const state = this.feed.state();
     const unplayable = this.#unplayable();
     const isShown = state.kind === "live" || state.kind === "idle";
-    const outage = isShown ? null : this.#outage();
-    if (outage) return { kind: "lost", sinceMs: outage.sinceMs, reason: `Camera: ${outage.cause}.` };
+    const signalLoss = isShown ? null : this.#signalLoss();
+    if (signalLoss) return { kind: "lost", sinceMs: signalLoss.sinceMs, reason: `Camera: ${signalLoss.cause}.` };
     if (!unplayable || isShown || this.feed.failure?.status !== kNoSuchApi) return state;
     return { kind: "unavailable", reason: unplayable.reason };
   }

@@ -56,7 +56,7 @@ export class MapsScreen extends Screen {
     this.front.append(this.#stage);
     this.every(kRefreshMs, () => this.#overlay.refresh());
     this.every(kStatesIntervalMs, () => void this.#loadStates());
-    this.every(kStatesIntervalMs, () => void (this.#overlay.camera && this.server.outages.refresh()));
+    this.every(kStatesIntervalMs, () => void (this.#overlay.camera && this.server.signalLosses.refresh()));
     void this.#start();
   }
 

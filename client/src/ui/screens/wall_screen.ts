@@ -16,7 +16,7 @@ import { Screen, type Session } from "./screen";
 const kRefreshMs = 500;
 /** Cameras come and go seldom. */
 const kListIntervalMs = 30_000;
-const kOutagesIntervalMs = 5_000;
+const kSignalLossesIntervalMs = 5_000;
 
 export class WallScreen extends Screen {
   readonly #grid: Grid;
@@ -42,7 +42,7 @@ export class WallScreen extends Screen {
     document.addEventListener("visibilitychange", loadUnlessHidden, { signal: this.closed });
     this.every(kListIntervalMs, loadUnlessHidden);
     this.every(kRefreshMs, () => this.#refresh());
-    this.every(kOutagesIntervalMs, () => void (document.hidden || this.server.outages.refresh()));
+    this.every(kSignalLossesIntervalMs, () => void (document.hidden || this.server.signalLosses.refresh()));
     this.#refresh();
     void this.#load();
   }
@@ -73,7 +73,7 @@ export class WallScreen extends Screen {
   async #load(): Promise<void> {
     const [list] = await Promise.all([
       this.server.cameras().catch((error: ServerError) => error),
-      this.server.outages.refresh(),
+      this.server.signalLosses.refresh(),
     ]);
     if (this.closed.aborted) return;
     this.#error = list instanceof ServerError ? list.message : "";

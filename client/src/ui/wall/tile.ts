@@ -41,7 +41,7 @@ export class Tile {
     this.#open = element("button", { type: "button", class: "tile-open" });
     this.picture = new LivePicture(
       () => this.unplayable,
-      () => server.outages.of(camera),
+      () => server.signalLosses.of(camera),
       () => this.#showState(),
       false,
     );
@@ -92,7 +92,7 @@ export class Tile {
       case "unavailable":
         return "not available";
       case "lost":
-        return this.#server.outages.of(this.camera)?.cause ?? "no signal";
+        return this.#server.signalLosses.of(this.camera)?.cause ?? "no signal";
       case "live":
       case "connecting":
         return signalText(state, this.picture.feed.source?.pollIntervalMs);

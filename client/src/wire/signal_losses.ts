@@ -4,7 +4,7 @@
 
 import type { Camera, Server } from "./server";
 
-export interface Outage {
+export interface SignalLoss {
   /** Unix milliseconds; when it was first noticed. */
   sinceMs: number;
   /** In few words, for the user. */
@@ -22,12 +22,12 @@ const kCauses: Record<string, string> = {
   "unknown-host": "unknown host",
   "wrong-password": "wrong password",
   certificate: "untrusted certificate",
-  stalled: "no answer in time",
+  stalled: "no picture in time",
 };
 
-export class Outages {
+export class SignalLosses {
   readonly #server: Server;
-  readonly #known = new Map<number, Outage>();
+  readonly #known = new Map<number, SignalLoss>();
 
   constructor(server: Server) {
     this.#server = server;
@@ -47,7 +47,7 @@ export class Outages {
   }
 
   /** Null for a camera that is well, that nobody asks for, or that another host has. */
-  of({ id, server }: Camera): Outage | null {
+  of({ id, server }: Camera): SignalLoss | null {
     return server ? null : (this.#known.get(id) ?? null);
   }
 }

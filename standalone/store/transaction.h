@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Several changes as one.
+// Several changes as one transaction.
 #pragma once
 
 #include <functional>
@@ -10,6 +10,7 @@
 namespace lookhaven::store {
 
 // Makes all the changes that the function makes by the store's record classes, or, when it throws, none of them.
-void ChangeTogether(Store& store, const std::function<void()>& changes);
+// Throws StoreError, and what the changes throw.
+void InTransaction(Store& store, const std::function<void()>& changes);
 
 }  // namespace lookhaven::store
