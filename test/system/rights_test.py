@@ -66,6 +66,7 @@ def camera_2(data):
 
 # Whether an answer's data tells of what stands behind the colon, by method.
 TELLS = {
+    ("CameraStates", "camera"): lambda data: any(one["id"] == 2 for one in data["camera"]),
     ("Groups", "camera"): camera_2,
     ("Mounts", "camera"): camera_2,
     ("Emaps", "map"): lambda data: any(one["id"] == 1 for one in data["emap"]),
