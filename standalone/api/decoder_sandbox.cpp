@@ -27,8 +27,14 @@ using base::SystemCallFilter;
 
 namespace {
 
-constexpr std::uint64_t kWriting =
-    LANDLOCK_ACCESS_FS_WRITE_FILE | LANDLOCK_ACCESS_FS_MAKE_REG | LANDLOCK_ACCESS_FS_REMOVE_FILE;
+constexpr std::string_view kSqlite = "sqlite:";
+
+bool IsSqlite(const std::string& store_url) {
+    return store_url.starts_with(kSqlite);
+}
+
+constexpr std::uint64_t kWriting = LANDLOCK_ACCESS_FS_WRITE_FILE | LANDLOCK_ACCESS_FS_MAKE_REG |
+                                   LANDLOCK_ACCESS_FS_MAKE_DIR | LANDLOCK_ACCESS_FS_REMOVE_FILE;
 
 void MayWriteBelow(const base::FileDescriptor& rules, const std::filesystem::path& folder) {
     const base::FileDescriptor opened(::open(folder.c_str(), O_PATH | O_CLOEXEC));
@@ -41,7 +47,7 @@ void MayWriteBelow(const base::FileDescriptor& rules, const std::filesystem::pat
 // Whatever the rules say of files, a process under Landlock reaches no process outside: neither its memory nor its
 // descriptors, not even as root. A kernel without it leaves that to Yama. It writes what a player has to: the store,
 // its progress and its player file; so it makes no process of ours one that is killed first.
-void ShieldOtherProcesses(const std::filesystem::path& home) {
+void ShieldOtherProcesses(const base::Installation& installation) {
     landlock_ruleset_attr attributes{};
     attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE | kWriting | LANDLOCK_ACCESS_FS_MAKE_SYM |
                                    LANDLOCK_ACCESS_FS_MAKE_SOCK | LANDLOCK_ACCESS_FS_MAKE_FIFO |
@@ -52,10 +58,15 @@ void ShieldOtherProcesses(const std::filesystem::path& home) {
         return;
     }
     if (rules) {
-        for (const std::filesystem::path& folder :
-             {home, std::filesystem::path("/tmp"), std::filesystem::path("/dev")}) {
-            MayWriteBelow(rules, folder);
+        MayWriteBelow(rules, installation.Home());
+        MayWriteBelow(rules, installation.RunFolder());
+        if (const std::string store = installation.StoreUrl(); IsSqlite(store)) {
+            std::error_code error;
+            const std::filesystem::path file = store.substr(kSqlite.size());
+            MayWriteBelow(rules, std::filesystem::weakly_canonical(file, error).parent_path());
         }
+        MayWriteBelow(rules, "/tmp");
+        MayWriteBelow(rules, "/dev");
     }
     if (!rules || ::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 ||
         ::syscall(SYS_landlock_restrict_self, rules.Get(), 0) != 0) {
@@ -112,6 +123,12 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     for (const int command : {FIOSETOWN, SIOCSPGRP, TIOCSTI, TIOCLINUX}) {
         filter.AddException({SCMP_SYS(ioctl)}, {{1, command}});
     }
+    // What Landlock of many kernels does not know: emptying files, and changing whose they are.
+    filter.AddException({SCMP_SYS(truncate), SCMP_SYS(truncate64), SCMP_SYS(creat), SCMP_SYS(openat2), SCMP_SYS(chmod),
+                         SCMP_SYS(fchmodat), SCMP_SYS(chown), SCMP_SYS(lchown), SCMP_SYS(fchownat), SCMP_SYS(setxattr),
+                         SCMP_SYS(lsetxattr)});
+    filter.AddException({SCMP_SYS(open)}, {{1, O_TRUNC, O_TRUNC}});
+    filter.AddException({SCMP_SYS(openat)}, {{2, O_TRUNC, O_TRUNC}});
     // The rings of live views.
     filter.AddException({SCMP_SYS(shmget), SCMP_SYS(shmat), SCMP_SYS(shmctl)});
     // Parts of the kernel in which faults are found, and which nothing here uses.
@@ -137,7 +154,7 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
         filter.AddException({SCMP_SYS(socket)}, {{2, bit, bit}});
     }
     filter.AddException({SCMP_SYS(socketpair)}, {ArgumentIsNot(0, AF_UNIX)});
-    if (store_url.starts_with("sqlite:")) {
+    if (IsSqlite(store_url)) {
         for (const int family : {AF_INET, AF_INET6}) {
             filter.AddException({SCMP_SYS(socket)}, {{0, family}});
         }
@@ -145,8 +162,8 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     return filter.Program();
 }
 
-void EnterPlaybackSandbox(const std::filesystem::path& home, const std::vector<sock_filter>& playback_filter) {
-    ShieldOtherProcesses(home);
+void EnterPlaybackSandbox(const base::Installation& installation, const std::vector<sock_filter>& playback_filter) {
+    ShieldOtherProcesses(installation);
     Install(playback_filter);
 }
 

@@ -9,12 +9,12 @@
 //               requests both keep their own slot (SlotTable::KeepOnly), a player once the host knows it.
 #pragma once
 
-#include <filesystem>
 #include <string>
 #include <vector>
 
 #include <linux/filter.h>
 
+#include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
 
 namespace lookhaven::api {
@@ -24,7 +24,7 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url);
 // Each confines the calling process, which has one thread, for good. Where the kernel has no filters it is logged, and
 // the process keeps its calls. Throws std::system_error. EnterPlaybackSandbox leaves the slots alone: call
 // SlotTable::KeepOnly, too. EnterStillPictureSandbox does that itself, and does not use Landlock.
-void EnterPlaybackSandbox(const std::filesystem::path& home, const std::vector<sock_filter>& playback_filter);
+void EnterPlaybackSandbox(const base::Installation& installation, const std::vector<sock_filter>& playback_filter);
 void EnterStillPictureSandbox(control::SlotTable& slots, const control::Slot& own);
 
 }  // namespace lookhaven::api

@@ -95,7 +95,7 @@ void Download(const Call& call, std::optional<store::MarkKind> kind, int event) 
     call.slots.KeepOnly(call.slot);
     const base::Installation& installation = call.context.Installation();
     // The copier reads what a camera has sent.
-    EnterPlaybackSandbox(installation.Home(), PlaybackFilter(installation.StoreUrl()));
+    EnterPlaybackSandbox(installation, PlaybackFilter(installation.StoreUrl()));
     try {
         remux.Copy(path, STDOUT_FILENO, options);
     } catch (const std::system_error& error) {

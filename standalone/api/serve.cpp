@@ -161,7 +161,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
         PreparePlayer(call);
     }
     if (IsPlayer(call)) {
-        EnterPlaybackSandbox(service.installation.Home(), service.playback_filter);
+        EnterPlaybackSandbox(service.installation, service.playback_filter);
     }
     return RunModule(entry, call);
 }

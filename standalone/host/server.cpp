@@ -199,11 +199,14 @@ void Server::StartRequest(Connection connection) {
     const int number = connection.socket.Get();
     http::Request request = connection.parser.TakeRequest();
     if (request.unread_body_bytes > 0 && !MayHaveSession(request)) {
-        return Refuse(connections_[number] = std::move(connection), LooksLikeLogIn(request) ? 413 : 401,
+        const bool is_log_in = LooksLikeLogIn(request);
+        request.Wipe();
+        return Refuse(connections_[number] = std::move(connection), is_log_in ? 413 : 401,
                       "log in first: without a session a body holds 4 KiB at most");
     }
     control::Slot* slot = slots_.Take(LooksLikeLogIn(request) ? 0 : limits_.kept_for_log_in);
     if (slot == nullptr) {
+        request.Wipe();
         return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
     }
     const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {

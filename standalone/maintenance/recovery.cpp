@@ -57,6 +57,7 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
     bool is_complete = true;
     store::Events events(store);
+    events.SetMissingOrders(mount.id);
     for (const store::Event& row : events.Open()) {
         if (row.mount_id == mount.id && row.id < first_reserved_id && !row.demo) {
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });

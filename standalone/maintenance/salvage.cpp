@@ -87,13 +87,14 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
                            int new_id, int keep_below) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     const std::optional<store::Event> present = events.Find(name.event);
-    if (IsRowOf(present, name) || events.IsPendingDeletion(name.event)) {
+    const std::optional<std::string> pending = events.PathPendingDeletion(name.event);
+    if (IsRowOf(present, name) || pending == archive::PathOf(name)) {
         return "its event has come meanwhile";
     }
     if (contents.frame_count == 0) {
         return Discard(mount, name);
     }
-    if (!present && name.event < keep_below) {
+    if (!present && !pending && name.event < keep_below) {
         events.Begin(RowOf(name, mount_id, contents));
         return "adopted " + (mount.Path() / archive::PathOf(name)).string();
     }

@@ -217,6 +217,8 @@ class Verification {
 
     void CheckStrayRecording(const MountFolder& mount, int mount_id, const archive::FileName& name,
                              const std::string& path) {
+        // First: a recorder that takes the lease after this has higher ids.
+        int new_id = repair_ ? events_.NextId() : 0;
         const store::LeaseState lease = store::RecorderLease(store_).Current();
         const bool has_recorder = !lease.holder.empty();
         if (has_recorder && name.event >= lease.first_reserved_id && name.event < listed_below_) {
@@ -225,7 +227,6 @@ class Verification {
             return;
         }
         Report("no event has the file " + path, [&] {
-            int new_id = events_.NextId();
             if (has_recorder && new_id == name.event) {
                 new_id = events_.NextId();
             }
@@ -235,7 +236,8 @@ class Verification {
 
     // True for an event that began after the rows were read.
     bool HasRow(const archive::FileName& name) {
-        return IsRowOf(events_.Find(name.event), name) || events_.IsPendingDeletion(name.event);
+        return IsRowOf(events_.Find(name.event), name) ||
+               events_.PathPendingDeletion(name.event) == archive::PathOf(name);
     }
 
     bool HasMark(int id) {

@@ -2,6 +2,7 @@
 //
 // Questions about events; events.cpp changes them.
 #include <algorithm>
+#include <limits>
 #include <utility>
 
 #include "standalone/store/connection.h"
@@ -108,8 +109,8 @@ std::vector<Event> Events::InRecordingOrder(int mount_id, const Event& after, in
         mount_id, after.order, after.id, limit);
 }
 
-bool Events::IsPendingDeletion(int id) {
-    return connection_.FetchOne<int>("select count(*) from events_pending_deletion where id = :id", id).value() > 0;
+std::optional<std::string> Events::PathPendingDeletion(int id) {
+    return connection_.FetchOne<std::string>("select path from events_pending_deletion where id = :id", id);
 }
 
 std::int64_t Events::OrderForDate(int mount_id, std::int64_t start_s) {
@@ -118,12 +119,13 @@ std::int64_t Events::OrderForDate(int mount_id, std::int64_t start_s) {
     if (next.empty()) {
         return kOrderOfId;
     }
-    // What was recorded before it: a single row that a wrong clock dated ahead does not make it old.
+    // What was recorded within a day before it: a single row that a wrong clock dated ahead does not make it old.
     std::int64_t order = next.front().order - 1;
     for (const int camera : cameras) {
         for (const Event& before : connection_.FetchAll<Event>(
-                 "where camera_id = :camera and start_s < :start and mount_id = :mount order by start_s desc limit 1",
-                 camera, start_s, mount_id)) {
+                 "where camera_id = :camera and start_s < :start and start_s >= :earliest and mount_id = :mount"
+                 " and demo = 0 order by start_s desc limit 1",
+                 camera, start_s, start_s - 86'400, mount_id)) {
             order = std::max(order, before.order);
         }
     }

@@ -4,6 +4,7 @@
 #include "standalone/store/events.h"
 
 #include <algorithm>
+#include <limits>
 
 #include "standalone/store/connection.h"
 #include "standalone/store/event_row.h"
@@ -137,6 +138,11 @@ void Events::BeginDeletion(std::span<const int> ids) {
 void Events::FinishDeletion(std::span<const int> ids) {
     connection_.Write(
         [&](soci::session& sql) { ForEachId(sql, ids, "delete from events_pending_deletion where id = :id"); });
+}
+
+void Events::SetMissingOrders(int mount_id) {
+    connection_.Execute("update events set recording_order = id where mount_id = :mount and recording_order = :missing",
+                        mount_id, std::numeric_limits<std::int64_t>::max());
 }
 
 void Events::CancelDeletion(std::span<const int> ids) {

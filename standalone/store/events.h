@@ -120,7 +120,10 @@ class Events {
     // Finished events of the mount that are neither archived nor demo, in the order in which they were recorded: those
     // after that event, from the first on after Event().
     std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
-    bool IsPendingDeletion(int id);
+    // Of the event's row that is pending deletion; nothing when there is none.
+    std::optional<std::string> PathPendingDeletion(int id);
+    // Gives the mount's rows of a recorder of an earlier version, which has no order of recording, that of their ids.
+    void SetMissingOrders(int mount_id);
     // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far as
     // dates tell, but not before what precedes it. kOrderOfId when nothing was recorded after it.
     std::int64_t OrderForDate(int mount_id, std::int64_t start_s);

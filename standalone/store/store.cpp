@@ -102,7 +102,8 @@ int Store::Migrate(const std::string& url) {
     Connection connection(address);
     return connection.Write([&](soci::session& sql) {
         if (!connection.IsSqlite()) {
-            Execute(sql, "set local statement_timeout = 0");  // a step may rewrite a million rows
+            Execute(sql, "set local statement_timeout = 0");  // a step may rewrite a million rows …
+            Execute(sql, "set local lock_timeout = '5s'");    // … but whoever waits for it holds up the others
         }
         LockSchema(connection, sql);
         const int version = ReadVersion(connection);

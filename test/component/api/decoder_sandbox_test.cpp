@@ -4,6 +4,7 @@
 #include "standalone/api/decoder_sandbox.h"
 
 #include <csignal>
+#include <fstream>
 #include <functional>
 #include <string>
 #include <thread>
@@ -64,9 +65,11 @@ TEST(DecoderSandbox, LeavesADecoderWhatItsProcessNeeds) {
     const control::Slot& other = *slots.Take();
     const control::Slot& own = *slots.Take();
     const int wake = slots.WakeDescriptor();
+    const base::Installation installation((base::Installation::CreateFolders(home), home.Path()));
+    std::ofstream(home / "recording") << "footage";
     const auto filter = api::PlaybackFilter("postgresql:");
     const auto play = [&] {
-        api::EnterPlaybackSandbox(home.Path(), filter);
+        api::EnterPlaybackSandbox(installation, filter);
         slots.KeepOnly(own);
     };
     ::prctl(PR_SET_PTRACER, PR_SET_PTRACER_ANY);  // else Yama might be what refuses
@@ -101,6 +104,9 @@ TEST(DecoderSandbox, LeavesADecoderWhatItsProcessNeeds) {
         {"wakes the host", [wake, one = std::uint64_t{1}] { return ::write(wake, &one, sizeof one) > 0; }, false},
         {"opens a socket of a rare family", [] { return ::socket(AF_NETLINK, SOCK_RAW, 0) >= 0; }, false},
         {"opens one of a rare protocol", [] { return ::socket(AF_INET, SOCK_STREAM, 262) >= 0; }, false},
+        {"empties a recording", [&] { return ::truncate((home / "recording").c_str(), 0) == 0; }, false},
+        {"empties one on opening", [&] { return ::open((home / "recording").c_str(), O_RDONLY | O_TRUNC) >= 0; },
+         false},
         {"has itself spared", [&] { return ::open("/proc/self/oom_score_adj", O_WRONLY) >= 0; }, lacks_landlock},
         {"listens", [] { return ::listen(::socket(AF_INET, SOCK_STREAM, 0), 1) == 0; }, false},
         {"reaches a database", [] { return ::socket(AF_UNIX, SOCK_STREAM, 0) >= 0; }, true},
