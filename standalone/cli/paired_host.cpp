@@ -34,6 +34,7 @@ std::vector<PairedHostAnswer> AskPairedHosts(store::Store& store) {
         }
     }
     std::vector<PairedHostAnswer> answers;
+    answers.reserve(asked.size());
     for (std::future<PairedHostAnswer>& answer : asked) {
         answers.push_back(answer.get());
     }

@@ -135,6 +135,7 @@ RecordingSupervisor::CameraStates(const std::map<int, CameraSignal>& signals) {
         }
     }
     std::vector<maintenance::RecordingStatus> list;
+    list.reserve(states.size());
     for (const auto& [camera, status] : states) {
         list.push_back(status);
     }

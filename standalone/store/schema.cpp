@@ -152,8 +152,8 @@ constexpr const char* kRenumberedRecordings[] = {
     "alter table events_pending_deletion add column recording_order bigint not null default 0",
     "update events_pending_deletion set recording_order = id",
     "drop index events_by_order",
-    "create index events_by_order on events (mount_id, recording_order, id, size_bytes)"
-    " where recording = 0 and archived = 0 and demo = 0",
+    ("create index events_by_order on events (mount_id, recording_order, id, size_bytes)"
+     " where recording = 0 and archived = 0 and demo = 0"),
 };
 
 constexpr const char* kPendingReports[] = {
