@@ -6,6 +6,7 @@
 #include <fstream>
 #include <string>
 
+#include <fcntl.h>
 #include <unistd.h>
 
 #include "platform/output/multipartresponse.h"
@@ -24,8 +25,13 @@ void Handle(int number, void (*handler)(int)) {
     sigaction(number, &action, nullptr);
 }
 
+// Without O_TRUNC, which players have given up.
 void WritePlayerFile(const std::string& path) {
-    std::ofstream(path) << getpid();
+    const int file = ::open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    if (::ftruncate(file, 0) == 0) {
+        ::dprintf(file, "%d", ::getpid());
+    }
+    ::close(file);
 }
 
 void CheckPlayerFile(const std::string& path) {
