@@ -1,0 +1,118 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/binding/slow_viewer.h"
+
+#include <cstdint>
+#include <optional>
+#include <utility>
+
+#include <time.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/binding/request_context.h"
+#include "standalone/binding/send_queue.h"
+
+namespace lookhaven::binding {
+
+namespace {
+
+// A muxed stream needs each frame, so it falls behind on a slow connection; from here on it skips to a key frame.
+constexpr std::int64_t kMaxBehindMs = 2'000;
+// The stream is not to end by the time-out of who writes nothing for twenty seconds.
+constexpr std::int64_t kMaxSoundPauseUs = 10'000'000;
+
+bool IsDrained() {
+    SendQueue* queue = RequestContext::Current().Queue();
+    return queue == nullptr || queue->IsDrained();
+}
+
+bool TakeOverdueTurn() {
+    SendQueue* queue = RequestContext::Current().Queue();
+    return queue != nullptr && queue->TakeOverdueTurn();
+}
+
+// Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's
+// longest wait; nothing when neither came about, or a signal came.
+std::optional<int> AwaitDrained() {
+    constexpr timespec kPoll{0, 3'000'000};
+    const std::int64_t until_us = base::MonotonicMicros() + ring::kMaxWaitMillis * 1000;
+    while (!IsDrained() && !TakeOverdueTurn()) {
+        if (base::MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
+            return std::nullopt;
+        }
+    }
+    return static_cast<int>((until_us - base::MonotonicMicros()) / 1000);
+}
+
+bool IsBehind(const ring::Entry& entry) {
+    return base::WallMillis() - entry.CaptureMillis() > kMaxBehindMs;
+}
+
+// How the muxed stream of this process stands.
+struct Lag {
+    bool has_begun = false;     // the group of pictures that it began with is over, or was caught up with
+    bool is_held_back = false;  // a slow connection kept it from the newest frame
+    bool is_skipping = false;
+    bool is_sound_held_back = false;
+    std::int64_t sound_us = 0;  // monotonic, when sound was last given out
+} g_lag;
+
+// Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that
+// is not. The group that a stream begins with is sent whatever its age.
+bool IsSkipped(const ring::Entry& entry) {
+    const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
+    const bool is_behind = IsBehind(entry);
+    g_lag.has_begun = g_lag.has_begun || is_key || !is_behind;
+    g_lag.is_held_back = g_lag.is_held_back && is_behind;
+    g_lag.is_skipping = (g_lag.is_skipping && !(is_key && !is_behind)) || (g_lag.is_held_back && g_lag.has_begun);
+    return g_lag.is_skipping;
+}
+
+// After ten seconds without a frame whatever is older is skipped, so only such a key frame can use the turn.
+bool HasFreshKeyFrame(void* stream) {
+    const ring::Entry* entry = ring::ReadLatestIFrame(stream);
+    const bool is_fresh = entry != nullptr && !IsBehind(*entry);
+    ring::ReadIFrameFinish(stream, entry, nullptr);
+    return is_fresh;
+}
+
+}  // namespace
+
+const ring::Entry* ReadLatestPicture(void* stream, int last_sequence, ring::Position* position) {
+    const std::optional<int> left_millis = AwaitDrained();
+    return left_millis ? ring::ReadLatest(stream, last_sequence, position, *left_millis) : nullptr;
+}
+
+const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position* position) {
+    if (!IsDrained() && base::MonotonicMicros() - g_lag.sound_us < kMaxSoundPauseUs) {
+        g_lag.is_sound_held_back = true;
+        return nullptr;
+    }
+    const ring::Entry* entry = ring::ReadNext(stream, last_sequence, position);
+    if (entry != nullptr) {
+        g_lag.sound_us = base::MonotonicMicros();
+    }
+    if (entry == nullptr || !std::exchange(g_lag.is_sound_held_back, false) || !IsBehind(*entry)) {
+        return entry;
+    }
+    last_sequence = entry->sequence;
+    ring::ReadFinish(stream, entry, position);
+    return ring::ReadLatest(stream, last_sequence, position, 0);
+}
+
+const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
+                                   const ring::SecondReader& sound) {
+    if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverdueTurn())) {
+        g_lag.is_held_back = true;
+        return nullptr;
+    }
+    const ring::Entry* entry = sound.position != nullptr ? ring::ReadNext(stream, last_sequence, position, sound)
+                                                         : ring::ReadNext(stream, last_sequence, position);
+    while (entry != nullptr && IsSkipped(*entry)) {
+        last_sequence = entry->sequence;
+        ring::ReadFinish(stream, entry, position);
+        entry = ring::ReadNext(stream, last_sequence, position);
+    }
+    return entry;
+}
+
+}  // namespace lookhaven::binding
