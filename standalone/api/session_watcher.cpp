@@ -46,8 +46,9 @@ bool TryToPurge(store::Store& records, std::int64_t now_s) {
     }
 }
 
-void Watch(const base::Installation& installation, control::SlotTable& slots) {
+void Watch(const base::Installation& installation, control::SlotTable& slots, SessionFilter& filter) {
     store::Store records = store::Store::Open(installation.StoreUrl());
+    filter.Learn(store::Sessions(records).Key());
     std::int64_t due_s = 0;
     std::int64_t pause_s = kMinPurgePauseSeconds;
     for (;; std::this_thread::sleep_for(kPeriod)) {
@@ -63,11 +64,11 @@ void Watch(const base::Installation& installation, control::SlotTable& slots) {
 
 }  // namespace
 
-void WatchSessions(const base::Installation& installation, control::SlotTable& slots) {
+void WatchSessions(const base::Installation& installation, control::SlotTable& slots, SessionFilter& filter) {
     base::SetLogProgram("session-watcher");
     for (std::string last_problem;;) {
         try {
-            Watch(installation, slots);
+            Watch(installation, slots, filter);
         } catch (const std::exception& error) {
             if (last_problem != error.what()) {
                 last_problem = error.what();

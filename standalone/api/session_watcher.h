@@ -4,13 +4,15 @@
 // account denied or removed.
 #pragma once
 
+#include "standalone/api/session_filter.h"
 #include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
 
 namespace lookhaven::api {
 
-// Marks the slots of ended sessions in the table, twice a second, until the process is killed. A store that fails is
-// tried again. Runs in a process of its own.
-[[noreturn]] void WatchSessions(const base::Installation& installation, control::SlotTable& slots);
+// Marks the slots of ended sessions in the table, twice a second, until the process is killed; hands the host's filter
+// the store's session key at first. A store that fails is tried again. Runs in a process of its own.
+[[noreturn]] void WatchSessions(const base::Installation& installation, control::SlotTable& slots,
+                                SessionFilter& filter);
 
 }  // namespace lookhaven::api

@@ -27,7 +27,9 @@ std::optional<std::string> DecodeForm(std::string_view text, BrokenEscape broken
 std::string ToBase64(std::string_view bytes);
 std::optional<std::string> FromBase64(std::string_view text);
 
-// Two digits each, 0 to 9 and a to f.
+constexpr std::string_view kHexDigits = "0123456789abcdef";
+
+// Two digits each.
 std::string ToHex(std::span<const unsigned char> bytes);
 
 // Whether it is that many hexadecimal digits, in lower case.

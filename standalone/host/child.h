@@ -8,17 +8,8 @@
 #include <sys/types.h>
 
 #include "standalone/control/slot_table.h"
-#include "standalone/http/request.h"
 
 namespace lookhaven::host {
-
-// The work of the host's child processes, given by the program. Each runs in a process of its own after LeaveHost.
-struct ChildWork {
-    // Answers the request on standard output.
-    std::function<void(http::Request&, control::SlotTable&, control::Slot&)> serve_request;
-    // Marks the slots whose session has ended elsewhere, again and again; does not return.
-    std::function<void(control::SlotTable&)> watch_sessions;
-};
 
 // Makes a just forked process independent of its host: it dies with the host, keeps of the host's descriptors only 0,
 // 2, what now is 1 (the given one, when not negative) and the table's wake descriptor, and takes signals as a fresh

@@ -15,7 +15,6 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
-#include "standalone/base/text.h"
 #include "standalone/control/player_file.h"
 #include "standalone/http/answer.h"
 
@@ -42,19 +41,6 @@ bool LooksLikeLogIn(const http::Request& request) {
            request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
 }
 
-// A session's secret is 64 hexadecimal digits; whether there is such a session only a request process can ask.
-bool MayHaveSession(const http::Request& request) {
-    constexpr int kSecretDigits = 64;
-    int digits = 0;
-    for (const char each : request.Header("HTTP_COOKIE")) {
-        digits = base::IsHex({&each, 1}, 1) ? digits + 1 : 0;
-        if (digits == kSecretDigits) {
-            return true;
-        }
-    }
-    return false;
-}
-
 base::FileDescriptor BlockSignals() {
     sigset_t all;
     sigfillset(&all);
@@ -68,8 +54,9 @@ base::FileDescriptor BlockSignals() {
 
 }  // namespace
 
-Server::Server(const base::Installation& installation, ChildWork work, Listener& listener, const ServerLimits& limits)
-    : work_(std::move(work)),
+Server::Server(const base::Installation& installation, Callbacks callbacks, Listener& listener,
+               const ServerLimits& limits)
+    : callbacks_(std::move(callbacks)),
       limits_(limits),
       slots_(limits.requests),
       processes_(limits.processes, slots_, installation.ProgressFolder()),
@@ -198,7 +185,7 @@ void Server::Refuse(Connection& connection, int status, const std::string& messa
 void Server::StartRequest(Connection connection) {
     const int number = connection.socket.Get();
     http::Request request = connection.parser.TakeRequest();
-    if (request.unread_body_bytes > 0 && !MayHaveSession(request)) {
+    if (request.unread_body_bytes > 0 && !callbacks_.may_have_session(request)) {
         const bool is_log_in = LooksLikeLogIn(request);
         request.Wipe();
         return Refuse(connections_[number] = std::move(connection), is_log_in ? 413 : 401,
@@ -212,7 +199,7 @@ void Server::StartRequest(Connection connection) {
     const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {
         connections_.clear();  // others' requests, and their descriptors, whose numbers are given anew after this
         LeaveHost(host, slots_, number);
-        work_.serve_request(request, slots_, *slot);
+        callbacks_.serve_request(request, slots_, *slot);
     });
     request.Wipe();
     if (!process) {
@@ -231,7 +218,7 @@ void Server::StartWatcher() {
     if (watcher_pid_ == 0) {
         RunAndExit([&] {
             LeaveHost(host, slots_, -1);
-            work_.watch_sessions(slots_);
+            callbacks_.watch_sessions(slots_);
         });
     }
     watcher_.Reset(watcher_pid_ < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, watcher_pid_, 0)));

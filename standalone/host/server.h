@@ -10,6 +10,7 @@
 #include <array>
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <string>
 
@@ -20,8 +21,20 @@
 #include "standalone/host/listener.h"
 #include "standalone/host/process_table.h"
 #include "standalone/host/scgi.h"
+#include "standalone/http/request.h"
 
 namespace lookhaven::host {
+
+// What the host calls, given by the program.
+struct Callbacks {
+    // In a process of its own after LeaveHost: answers the request on standard output.
+    std::function<void(http::Request&, control::SlotTable&, control::Slot&)> serve_request;
+    // In a process of its own after LeaveHost: marks the slots whose session has ended elsewhere, again and again; does
+    // not return.
+    std::function<void(control::SlotTable&)> watch_sessions;
+    // In the host, and must not block: false when the request surely belongs to no session.
+    std::function<bool(const http::Request&)> may_have_session;
+};
 
 struct ServerLimits {
     std::size_t requests = 256;              // running at once …
@@ -34,7 +47,7 @@ class Server {
   public:
     // Borrows the listener, and closes it when it stops to serve. Removes what players of a killed host left in the
     // installation's folder of progress files. Blocks all signals of the process. Throws std::system_error.
-    Server(const base::Installation& installation, ChildWork work, Listener& listener, const ServerLimits& limits);
+    Server(const base::Installation& installation, Callbacks callbacks, Listener& listener, const ServerLimits& limits);
 
     // Serves until SIGTERM or SIGINT, then ends the request processes and returns when the last is gone.
     void Run();
@@ -61,7 +74,7 @@ class Server {
     void EndWatcher();
     Clock::time_point DoWhatIsDue();
 
-    const ChildWork work_;
+    const Callbacks callbacks_;
     ServerLimits limits_;
     control::SlotTable slots_;
     ProcessTable processes_;

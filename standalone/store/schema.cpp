@@ -160,6 +160,9 @@ constexpr const char* kPendingReports[] = {
     "create index marks_pending_by_reporter on marks (reporter_id, reported_s) where state = 0 and reporter_id <> 0",
 };
 
+// Their secrets carry no tag.
+constexpr const char* kTaggedSessions[] = {"delete from sessions"};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -169,6 +172,7 @@ constexpr Migration kMigrations[] = {
     {"cameras whose HTTPS certificate is not verified", kInsecureCameras},
     {"the order of recordings that got a new id", kRenumberedRecordings},
     {"reports whose footage is still to come", kPendingReports},
+    {"sessions whose secret carries a tag", kTaggedSessions},
 };
 
 }  // namespace

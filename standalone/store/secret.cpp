@@ -25,6 +25,19 @@ void InitialiseSodium() {
     }
 }
 
+const unsigned char* Bytes(std::string_view text) {
+    return reinterpret_cast<const unsigned char*>(text.data());
+}
+
+std::string Hash(std::string_view key, std::string_view text) {
+    InitialiseSodium();
+    std::array<unsigned char, 32> hash{};
+    if (crypto_generichash(hash.data(), hash.size(), Bytes(text), text.size(), Bytes(key), key.size()) != 0) {
+        throw std::invalid_argument("a key has 16 to 64 bytes");
+    }
+    return base::ToHex(hash);
+}
+
 }  // namespace
 
 std::string HashPassword(std::string_view password) {
@@ -52,11 +65,16 @@ std::string RandomHex(std::size_t size_bytes) {
 }
 
 std::string Digest(std::string_view text) {
-    InitialiseSodium();
-    std::array<unsigned char, 32> digest{};
-    crypto_generichash(digest.data(), digest.size(), reinterpret_cast<const unsigned char*>(text.data()), text.size(),
-                       nullptr, 0);
-    return base::ToHex(digest);
+    return Hash({}, text);
+}
+
+std::string Tag(std::string_view key, std::string_view text) {
+    return Hash(key, text).substr(0, kTagDigits);
+}
+
+bool TagMatches(std::string_view key, std::string_view text, std::string_view tag) {
+    const std::string expected = Tag(key, text);
+    return tag.size() == expected.size() && sodium_memcmp(tag.data(), expected.data(), tag.size()) == 0;
 }
 
 }  // namespace lookhaven::store

@@ -22,4 +22,11 @@ std::string RandomHex(std::size_t size_bytes);
 // BLAKE2b-256, 64 hex digits.
 std::string Digest(std::string_view text);
 
+// Keyed BLAKE2b, the first kTagDigits hex digits. Only who has the key (16 to 64 bytes) can make it.
+constexpr std::size_t kTagDigits = 16;
+std::string Tag(std::string_view key, std::string_view text);
+
+// Takes the same time wherever the tag differs.
+bool TagMatches(std::string_view key, std::string_view text, std::string_view tag);
+
 }  // namespace lookhaven::store

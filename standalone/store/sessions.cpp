@@ -22,12 +22,18 @@ struct Mapping<Session> {
 
 namespace {
 
-constexpr std::size_t kSecretBytes = 32;
+constexpr std::size_t kSecretDigits = 64;
+constexpr std::size_t kRandomDigits = kSecretDigits - kTagDigits;
 constexpr std::size_t kHandleBytes = 16;
 constexpr std::int64_t kTouchEveryS = 60;
 
 std::int64_t EndOf(const SessionLifetime& lifetime, std::int64_t created_s, std::int64_t now_s) {
     return std::min(now_s + lifetime.idle_s, created_s + lifetime.absolute_s);
+}
+
+std::string NewSecret(std::string_view key) {
+    const std::string random = RandomHex(kRandomDigits / 2);
+    return random + Tag(key, random);
 }
 
 }  // namespace
@@ -41,7 +47,7 @@ NewSession Sessions::Create(const VerifiedUser& user, std::int64_t now_s) {
 }
 
 NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::int64_t now_s) {
-    const NewSession session{RandomHex(kSecretBytes), RandomHex(kHandleBytes)};
+    const NewSession session{NewSecret(Key()), RandomHex(kHandleBytes)};
     const bool any_password = password_hash == nullptr;
     connection_.Write([&](soci::session& sql) {
         const auto found =
@@ -62,7 +68,11 @@ NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::
 }
 
 bool Sessions::MayBeSecret(std::string_view text) {
-    return base::IsHex(text, 2 * kSecretBytes);
+    return base::IsHex(text, kSecretDigits);
+}
+
+bool Sessions::MayBeSecret(std::string_view text, std::string_view key) {
+    return MayBeSecret(text) && TagMatches(key, text.substr(0, kRandomDigits), text.substr(kRandomDigits));
 }
 
 std::optional<Session> Sessions::FindBySecret(std::string_view secret, std::int64_t now_s) {
@@ -81,6 +91,10 @@ bool Sessions::Touch(const Session& session, std::int64_t now_s) {
     };
     return now_s >= session.last_seen_s + kTouchEveryS &&
            connection_.Write(touch, Durability::kLazy, Patience::kGivesUp);
+}
+
+std::string Sessions::Key() {
+    return connection_.FetchOne<std::string>("select value from settings where name = 'session_key'").value();
 }
 
 bool Sessions::End(std::string_view handle) {

@@ -3,9 +3,11 @@
 // Logins: a secret that the browser keeps in its cookie, and a public handle that names the session everywhere else.
 //
 // Why so        The handle becomes part of file names and log lines, so it must open nothing; and a copy of the store
-//               must not log anybody in, so it holds only a hash of the secret.
+//               must not log anybody in, so it holds only a hash of the secret. A keyed tag in the secret lets who
+//               has no store tell an invented one at the cost of a hash.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -24,7 +26,7 @@ struct SessionLifetime {
 };
 
 struct NewSession {
-    std::string secret;  // 64 hex digits; given out once, here
+    std::string secret;  // 64 hex digits, the last of them a tag; given out once, here
     std::string handle;  // 32 hex digits
 };
 
@@ -45,6 +47,7 @@ class Sessions {
 
     // A user has at most that many sessions: the oldest end.
     static constexpr int kMaxPerUser = 64;
+    static constexpr std::size_t kKeyDigits = 64;
 
     // Throws NotFound for an unknown user.
     NewSession Create(int user_id, std::int64_t now_s);
@@ -52,8 +55,10 @@ class Sessions {
     // could not end a session that did not exist yet.
     NewSession Create(const VerifiedUser& user, std::int64_t now_s);
 
-    // False for what cannot be a session's secret, without asking the store.
+    // False for what cannot be a session's secret, without asking the store. With the key, of Key(), only what the store
+    // has once given out can be one.
     static bool MayBeSecret(std::string_view text);
+    static bool MayBeSecret(std::string_view text, std::string_view key);
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
     std::optional<Session> FindBySecret(std::string_view secret, std::int64_t now_s);
 
@@ -71,6 +76,9 @@ class Sessions {
 
     // The number of rows deleted. Does not wait for other writers, either.
     int PurgeExpired(std::int64_t now_s);
+
+    // With which the secrets of this store's sessions are tagged; made by Store::Migrate, and stays.
+    std::string Key();
 
   private:
     // password_hash: null when it does not matter.

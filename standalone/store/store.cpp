@@ -10,6 +10,7 @@
 #include "standalone/store/connection.h"
 #include "standalone/store/schema.h"
 #include "standalone/store/secret.h"
+#include "standalone/store/sessions.h"
 
 namespace lookhaven::store {
 
@@ -75,6 +76,11 @@ int TakeSteps(soci::session& sql, int version) {
     return steps;
 }
 
+void SetOnce(soci::session& sql, const std::string& setting, const std::string& value) {
+    Execute(sql, "insert into settings (name, value) values (:name, :value) on conflict (name) do nothing", setting,
+            value);
+}
+
 }  // namespace
 
 Store::Store(std::unique_ptr<Connection> connection) : connection_(std::move(connection)) {}
@@ -111,8 +117,8 @@ int Store::Migrate(const std::string& url) {
             ThrowNewer(version);
         }
         const int steps = version == SchemaVersion() ? 0 : TakeSteps(sql, version);
-        Execute(sql, "insert into settings (name, value) values ('installation', :id) on conflict (name) do nothing",
-                RandomHex(kInstallationIdBytes));
+        SetOnce(sql, "installation", RandomHex(kInstallationIdBytes));
+        SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;
     });
 }

@@ -13,6 +13,7 @@
 #include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/modules.h"
 #include "standalone/api/serve.h"
+#include "standalone/api/session_filter.h"
 #include "standalone/api/session_watcher.h"
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
@@ -80,11 +81,16 @@ void Run(const Options& options) {
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
     const api::Service service{installation, modules, options.requests, api::PlaybackFilter(installation.StoreUrl())};
-    const host::ChildWork work{
-        .serve_request = [&service](http::Request& request, control::SlotTable& slots,
-                                    control::Slot& slot) { api::ServeRequest(service, request, slots, slot); },
-        .watch_sessions = [&installation](control::SlotTable& slots) { api::WatchSessions(installation, slots); }};
-    host::Server server(installation, work, listener, options.limits);
+    api::SessionFilter filter;
+    const host::Callbacks callbacks{
+        .serve_request =
+            [&](http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+                filter.Close();
+                api::ServeRequest(service, request, slots, slot);
+            },
+        .watch_sessions = [&](control::SlotTable& slots) { api::WatchSessions(installation, slots, filter); },
+        .may_have_session = [&](const http::Request& request) { return filter.MayHaveSession(request); }};
+    host::Server server(installation, callbacks, listener, options.limits);
     base::LogInfo("serving on " + listener.Name());
     server.Run();
 }

@@ -66,6 +66,23 @@ TEST_F(Admission, OnlyASessionMayCostMuch) {
     EXPECT_EQ(host_.Exchange(promise.substr(0, promise.size() - large.size())).status, 401) << "a body is not awaited";
 }
 
+TEST(FalseSession, CostsNoProcess) {
+    const HostUnderTest host({"--max-requests", "1"});
+    const std::string body(1 << 20, 'x');
+    const std::string real = host.LogIn().secret;
+    std::string invented = real;
+    invented.front() = real.front() == '0' ? '1' : '0';
+    const auto status = [&](const std::string& cookie) {
+        return host.Ask("api=Test&version=1&method=Success", cookie, {}, body).status;
+    };
+    const base::FileDescriptor stream = host.Open("Stream", real);
+    ASSERT_TRUE(host::Eventually(std::chrono::seconds(5), [&] { return status(invented) == 401; }))
+        << "all processes are taken, and it needs none";
+    EXPECT_EQ(status(std::string(64, 'a') + "; other=" + invented), 401);
+    EXPECT_EQ(status(real), 503);
+    EXPECT_EQ(status("z; id=" + real), 503) << "any of the cookies may be it";
+}
+
 TEST_F(Admission, FewPasswordsAreHashedAtOnce) {
     const std::string login = "api=VEXO.Auth&version=1&method=Login";
     const auto attempt = [&](int number) {
