@@ -181,10 +181,10 @@ class Installation:
         """Process ids below the web API host, its watcher included."""
         return descendants(self.part("webapi"))
 
-    def cli(self, *arguments, text=""):
+    def cli(self, *arguments, text="", timeout=60):
         done = subprocess.run(
             [pathlib.Path(self.environment["LOOKHAVEN_BUILD_FOLDER"], "bin/lookhaven"), *arguments],
-            env=self.environment, input=text, capture_output=True, text=True, timeout=60,
+            env=self.environment, input=text, capture_output=True, text=True, timeout=timeout,
         )
         if done.returncode != 0:
             raise AssertionError(f"lookhaven {' '.join(arguments)}: {done.stdout}{done.stderr}")
