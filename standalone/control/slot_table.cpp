@@ -9,7 +9,6 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
-#include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 
 namespace lookhaven::control {
@@ -22,11 +21,8 @@ struct alignas(Slot) SlotTable::Guard {
 
 namespace {
 
-// A pause in one word: the serial above, then the rate in 8 bits, then whether it is on.
-constexpr int kSerialShift = 9;
-
-bool IsPlayerOf(const Slot& slot, std::string_view session) {
-    return slot.serial != 0 && slot.player.key != 0 && SessionOf(slot) == session && !slot.MustEnd();
+std::string_view TextIn(const std::array<char, 64>& text) {
+    return {text.begin(), std::ranges::find(text, '\0')};  // a process that was taken over may have left no end
 }
 
 }  // namespace
@@ -71,6 +67,8 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->ended = 0;  // a process that was taken over may have left anything
     slot->is_stream = false;
     slot->has_session = false;
+    slot->has_call = false;
+    slot->status = 0;
     slot->pid = 0;
     slot->user = 0;
     slot->pairing = 0;
@@ -104,6 +102,21 @@ void SlotTable::KeepOnly(const Slot& slot) {
     guard_ = nullptr;
     slots_ = {};
     wake_.Reset();
+}
+
+void SlotTable::SetCall(Slot& slot, std::string_view call) {
+    slot.has_call = false;
+    slot.call.fill('\0');
+    call.copy(slot.call.data(), slot.call.size() - 1);
+    slot.has_call = true;
+}
+
+void SlotTable::VisitRunning(const std::function<void(const Slot&)>& visit) const {
+    for (const Slot& slot : Used()) {
+        if (slot.serial != 0) {
+            visit(slot);
+        }
+    }
 }
 
 void SlotTable::SetSession(Slot& slot, std::string_view handle) {
@@ -204,79 +217,8 @@ void SlotTable::MarkEnded(const RequestRef& use) {
     }
 }
 
-void SlotTable::BeginPlayer(Slot& slot, std::int64_t key) {
-    slot.player.key = key;
-    slot.player.started_us = base::MonotonicMicros();
-    Wake();
-}
-
-std::optional<RequestRef> SlotTable::FindPlayer(std::string_view session, std::int64_t key) const {
-    std::optional<RequestRef> found;
-    for (Slot& slot : Used()) {
-        const RequestRef use{&slot, slot.serial};
-        if (IsPlayerOf(slot, session) && slot.player.key == key && (!found || use.serial > found->serial)) {
-            found = use;
-        }
-    }
-    return found;
-}
-
 SharedLock SlotTable::LockPlayers() const {
     return TryLock(guard_->mutex);
-}
-
-std::uint64_t SlotTable::PackPause(std::uint64_t serial, const Pause& pause) {
-    const auto rate = static_cast<std::uint8_t>(pause.resumed_rate);
-    return serial << kSerialShift | std::uint64_t{rate} << 1 | (pause.on ? 1U : 0U);
-}
-
-Pause SlotTable::UnpackPause(std::uint64_t word) {
-    return {(word & 1) != 0, static_cast<std::int8_t>(word >> 1 & 0xff)};
-}
-
-bool SlotTable::ChangePause(const RequestRef& player, const std::function<void(Pause&)>& change) {
-    std::atomic<std::uint64_t>& word = player.slot->player.pause;
-    for (std::uint64_t held = word; held >> kSerialShift == player.serial;) {
-        Pause pause = UnpackPause(held);
-        change(pause);
-        if (word.compare_exchange_weak(held, PackPause(player.serial, pause))) {
-            return true;
-        }
-    }
-    return false;
-}
-
-std::set<std::string> SlotTable::SessionsWithPlayers() const {
-    std::set<std::string> sessions;
-    for (const Slot& slot : Used()) {
-        if (slot.serial != 0 && slot.player.started_us != 0) {
-            sessions.emplace(SessionOf(slot));
-        }
-    }
-    return sessions;
-}
-
-std::vector<Slot*> SlotTable::ExcessPlayers(std::string_view session, pid_t newest) const {
-    std::vector<std::pair<std::int64_t, Slot*>> others;  // when they began, read once: a player may change it
-    const Slot* owner = nullptr;
-    for (Slot& slot : Used()) {
-        if (slot.serial != 0 && slot.pid == newest && SessionOf(slot) == session) {
-            owner = &slot;
-        } else if (const std::int64_t started_us = slot.player.started_us;
-                   IsPlayerOf(slot, session) && started_us != 0) {
-            others.emplace_back(started_us, &slot);
-        }
-    }
-    if (newest <= 0 || owner == nullptr) {
-        return {};
-    }
-    std::ranges::sort(others, std::greater());
-    const int places = std::max(0, owner->player.max_players - (owner->MustEnd() ? 0 : 1));
-    std::vector<Slot*> excess;
-    for (std::size_t at = static_cast<std::size_t>(places); at < others.size(); ++at) {
-        excess.push_back(others[at].second);
-    }
-    return excess;
 }
 
 void SlotTable::Wake() {
@@ -296,8 +238,11 @@ void SlotTable::SetWakeDescriptor(int descriptor) {
 }
 
 std::string_view SessionOf(const Slot& slot) {
-    const auto end = std::ranges::find(slot.session, '\0');  // a process that was taken over may have left none
-    return slot.has_session ? std::string_view(slot.session.begin(), end) : std::string_view{};
+    return slot.has_session ? TextIn(slot.session) : std::string_view{};
+}
+
+std::string_view CallOf(const Slot& slot) {
+    return slot.has_call ? TextIn(slot.call) : std::string_view{};
 }
 
 }  // namespace lookhaven::control

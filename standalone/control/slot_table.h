@@ -5,8 +5,8 @@
 // Why so        The host cannot open the store (a fork would break the connection), so only a request process knows
 //               whose session it serves, and only the host's watcher process knows which sessions have ended.
 // Invariants    (1) Only the host takes and frees slots; a free slot belongs to nobody.
-//               (2) A session handle is written once per use of a slot, before has_session is set; what a player can
-//                   do, before its key is set.
+//               (2) A session handle is written once per use of a slot, before has_session is set; the call, before
+//                   has_call; what a player can do, before its key is set.
 //               (3) Other requests only store what they request of a player; only the host signals it.
 //               (4) What one request stores for another carries the serial of the request that it is meant for, so it
 //                   never reaches a later one in the same slot.
@@ -77,6 +77,9 @@ struct alignas(kSlotBytes) Slot {
     std::atomic<std::uint64_t> pairing;  // with the host that sent the request, or that it asks; 0: none
     std::atomic<Work> work;
     std::array<char, 64> session;
+    std::atomic<bool> has_call;
+    std::array<char, 64> call;
+    std::atomic<int> status;  // of the answer, once it is known
     Player player;
 
     bool MustEnd() const { return ended == serial; }
@@ -104,6 +107,11 @@ class SlotTable {
 
     // For a request process: sets the session of its slot. Throws std::length_error for a handle that is too long.
     static void SetSession(Slot& slot, std::string_view handle);
+
+    // For a request process: what it serves, "VEXO.Event/List", for those who count; only the first 63 bytes are kept.
+    static void SetCall(Slot& slot, std::string_view call);
+    // Of the slots of running requests. They may end, or change, at any time.
+    void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
     // For a request process, three ways to occupy something, each in one step among all processes: however many try at
     // once, no more than the limit succeed.
@@ -179,5 +187,7 @@ class SlotTable {
 
 // The session that the slot names; empty when none.
 std::string_view SessionOf(const Slot& slot);
+// What it serves; empty while that is not known.
+std::string_view CallOf(const Slot& slot);
 
 }  // namespace lookhaven::control

@@ -62,4 +62,9 @@ FrameQueue::Drops FrameQueue::Dropped() const {
     return drops_;
 }
 
+std::size_t FrameQueue::QueuedBytes() const {
+    const std::lock_guard lock(mutex_);
+    return queued_bytes_;
+}
+
 }  // namespace lookhaven::recorder

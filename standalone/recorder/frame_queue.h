@@ -53,6 +53,7 @@ class FrameQueue {
         bool is_dropping = false;
     };
     Drops Dropped() const;
+    std::size_t QueuedBytes() const;
 
   private:
     void SetFormat(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);

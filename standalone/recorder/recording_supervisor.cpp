@@ -170,6 +170,17 @@ std::shared_ptr<FrameQueue> RecordingSupervisor::QueueOf(control::LiveStream str
                : nullptr;
 }
 
+void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
+    const std::shared_ptr<FrameQueue> queue = QueueOf(counters.stream);
+    if (queue == nullptr) {
+        return;
+    }
+    counters.is_recorded = true;
+    counters.dropped_pictures = queue->Dropped().frames;
+    counters.queued_bytes = queue->QueuedBytes();
+    counters.written_us = entries_.at(counters.stream.camera).worker->WrittenUs();
+}
+
 void RecordingSupervisor::RequestStop() {
     missed_marks_.RequestStop();
     report_.RequestStop();

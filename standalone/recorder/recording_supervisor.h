@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/stream_counters.h"
 #include "standalone/recorder/mount_maintenance.h"
 #include "standalone/recorder/recording_report.h"
 #include "standalone/recorder/recording_worker.h"
@@ -37,6 +38,8 @@ class RecordingSupervisor {
 
     // The streams that must run because they are recorded.
     std::vector<control::LiveStream> NeededStreams() const;
+    // Adds what concerns the recording of that stream, if it is recorded.
+    void AddCounters(control::StreamCounters& counters) const;
     // Where to push the stream's frames; null when it is not recorded.
     std::shared_ptr<FrameQueue> QueueOf(control::LiveStream stream) const;
 

@@ -20,7 +20,8 @@ RecordingWorker::RecordingWorker(int camera, RecorderContext context, control::F
     : camera_(camera),
       context_(std::move(context)),
       flush_requests_(flush_requests),
-      queue_(std::make_shared<FrameQueue>(kQueueBytes)) {
+      queue_(std::make_shared<FrameQueue>(kQueueBytes)),
+      written_us_(base::MonotonicMicros()) {
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
@@ -71,6 +72,7 @@ void RecordingWorker::Record(CameraRecorder& recording, const std::stop_token& s
             recording.Take(std::move(*frame));
         }
         recording.Tick();
+        written_us_ = taken_us;
         const std::int64_t age_ms = (base::MonotonicMicros() - taken_us) / 1000;
         context_.rows.NoteWritten(camera_, (context_.wall_ms() - age_ms) / 1000);
         Publish(recording);

@@ -36,6 +36,10 @@ class RecordingWorker {
     // As the thread last published it, at most a quarter of a second old.
     maintenance::RecordingStatus State() const;
 
+    // Monotonic; up to when what had come was on the disk, or had been given up, half a second earlier at most. Stays
+    // behind while the disk lets the thread wait.
+    std::int64_t WrittenUs() const { return written_us_; }
+
     // Asks the thread to record what is queued, close the event and end; does not wait.
     void RequestStop() { thread_.request_stop(); }
     // Once true, destruction does not wait.
@@ -57,6 +61,7 @@ class RecordingWorker {
     std::atomic<int> asked_flush_ = 0;
     std::atomic<int> open_event_ = 0;
     std::atomic<maintenance::RecordingState> state_ = maintenance::RecordingState::kReady;
+    std::atomic<std::int64_t> written_us_;
     bool drops_reported_ = false;  // only the thread uses it
     std::atomic<bool> has_ended_ = false;
     std::jthread thread_;  // last: it uses the others

@@ -30,6 +30,7 @@ StreamWorker::StreamWorker(const base::Installation& installation, const media::
       plan_(std::move(plan)),
       options_{plan_.credentials, no_data_limit, plan_.insecure},
       backoff_(static_cast<std::uint32_t>(base::MonotonicMicros())) {
+    counts_.last_picture_us = base::MonotonicMicros();
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
@@ -47,6 +48,19 @@ StreamSignal StreamWorker::Signal() const {
 void StreamWorker::SetSignal(StreamSignal signal) {
     const std::lock_guard lock(mutex_);
     signal_ = std::move(signal);
+}
+
+StreamCounts StreamWorker::Counts() const {
+    const std::lock_guard lock(mutex_);
+    return counts_;
+}
+
+void StreamWorker::Count(const media::Packet& packet) {
+    counts_.bytes += packet.data.size();
+    if (packet.medium == base::Medium::kVideo) {
+        ++counts_.pictures;
+        counts_.last_picture_us = base::MonotonicMicros();
+    }
 }
 
 void StreamWorker::Run(const std::stop_token& stop) {
@@ -72,12 +86,17 @@ void StreamWorker::Run(const std::stop_token& stop) {
 void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
     bool live = false;
     std::optional<base::Codec> codec;
+    {
+        const std::lock_guard lock(mutex_);
+        ++counts_.connections;
+    }
     const std::unique_ptr<media::Source> source = media::OpenSource(kinds_, plan_.url, options_, stop);
     for (;;) {
         const media::Packet packet = source->Next();
         // Recording first: it does not depend on what the live view needs.
         {
             const std::lock_guard lock(mutex_);
+            Count(packet);
             if (recording_) {
                 recording_->Push(packet, source->Audio());
             }

@@ -43,6 +43,14 @@ struct StreamSignal {
     std::string reason = {};  // why they do not come, in one sentence without credentials; empty while they do
 };
 
+// Since the worker was started.
+struct StreamCounts {
+    std::uint64_t pictures = 0;
+    std::uint64_t bytes = 0;
+    std::uint64_t connections = 0;
+    std::int64_t last_picture_us = 0;  // monotonic; when the worker was started, before there is one
+};
+
 class StreamWorker {
   public:
     // Starts the stream's thread, which takes no signals. Installation and kinds must outlive the worker. Throws
@@ -52,6 +60,7 @@ class StreamWorker {
 
     const StreamPlan& Plan() const { return plan_; }
     StreamSignal Signal() const;
+    StreamCounts Counts() const;
 
     // Where frames go besides the rings; null when the stream is not recorded.
     void SetRecording(std::shared_ptr<FrameQueue> queue);
@@ -69,6 +78,7 @@ class StreamWorker {
     void ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio);
     void ReportFailure(const std::exception& failure);
     void SetSignal(StreamSignal signal);
+    void Count(const media::Packet& packet);
 
     const base::Installation& installation_;
     const media::SourceKinds& kinds_;
@@ -80,6 +90,7 @@ class StreamWorker {
     std::string ring_failure_;      // empty while the rings are written
     std::int64_t ring_pause_us_ = 0;
     mutable std::mutex mutex_;
+    StreamCounts counts_;
     StreamSignal signal_;
     std::shared_ptr<FrameQueue> recording_;
     std::atomic<bool> has_ended_ = false;

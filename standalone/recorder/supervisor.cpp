@@ -28,6 +28,7 @@ Supervisor::Supervisor(const base::Installation& installation, media::SourceKind
       no_data_limit_(no_data_limit),
       demand_(installation),
       common_config_(installation),
+      counters_(installation),
       catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }),
       recordings_(installation, no_data_limit) {
     DoEverySecond();
@@ -79,6 +80,7 @@ void Supervisor::DoEverySecond() {
     }
     catalog_.Refresh();
     recordings_.DoEverySecond(Signals());
+    PublishCounters();
     CorrectVideoTypes();
     if (seconds_++ % kOrphanSearchSeconds == 0) {
         if (const std::size_t removed = ring::RemoveOrphans(installation_); removed > 0) {
@@ -128,6 +130,22 @@ std::map<int, CameraSignal> Supervisor::Signals() const {
         }
     }
     return signals;
+}
+
+void Supervisor::PublishCounters() {
+    std::vector<control::StreamCounters> streams;
+    streams.reserve(workers_.size());
+    for (const auto& [stream, worker] : workers_) {
+        const StreamCounts counts = worker->Counts();
+        control::StreamCounters& published = streams.emplace_back();
+        published.stream = stream;
+        published.pictures = counts.pictures;
+        published.bytes = counts.bytes;
+        published.connections = counts.connections;
+        published.last_picture_us = counts.last_picture_us;
+        recordings_.AddCounters(published);
+    }
+    counters_.Write(streams);
 }
 
 // A camera may be set up anew, or exchanged, without lookhaven being told.

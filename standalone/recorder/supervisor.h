@@ -15,6 +15,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/control/common_config.h"
 #include "standalone/control/demand.h"
+#include "standalone/control/stream_counters.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/recording_supervisor.h"
 #include "standalone/recorder/stream_worker.h"
@@ -40,6 +41,7 @@ class Supervisor {
     void Reconcile();
     void DropEndedWorkers();
     std::map<int, CameraSignal> Signals() const;
+    void PublishCounters();
     void CorrectVideoTypes();
     void Start(control::LiveStream stream, const StreamPlan& plan);
     std::chrono::milliseconds TimeToNextStep() const;
@@ -49,6 +51,7 @@ class Supervisor {
     std::chrono::milliseconds no_data_limit_;
     control::Demand demand_;
     control::CommonConfigKeeper common_config_;
+    control::StreamCountersWriter counters_;
     Catalog catalog_;
     RecordingSupervisor recordings_;
     std::map<control::LiveStream, std::unique_ptr<StreamWorker>> workers_;

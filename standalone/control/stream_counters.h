@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the recorder counts of each stream that it runs, for those who watch over the installation.
+//
+// Why so        Numbers that change with every frame do not belong in a file that is written anew, nor in the store. So
+//               they lie in a mapped file, to which the recorder copies its counts every second.
+// Invariants    (1) A row's numbers may be of two different seconds; each by itself is whole.
+//               (2) Counts begin at 0 with each start of a stream.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <vector>
+
+#include "standalone/base/installation.h"
+#include "standalone/control/demand.h"
+#include "standalone/control/mapped_table.h"
+
+namespace lookhaven::control {
+
+// Times are monotonic microseconds, 0 for never.
+struct StreamCounters {
+    LiveStream stream;
+    std::uint64_t pictures = 0;
+    std::uint64_t bytes = 0;        // of pictures and sound
+    std::uint64_t connections = 0;  // attempts to reach the camera
+    std::int64_t last_picture_us = 0;  // when the stream was started, before there is one
+
+    // Of its recording, if it is recorded.
+    bool is_recorded = false;
+    std::uint64_t dropped_pictures = 0;  // because the disk was too slow
+    std::uint64_t queued_bytes = 0;      // waiting for the disk
+    std::int64_t written_us = 0;         // up to when what had come is on the disk
+
+    bool operator==(const StreamCounters&) const = default;
+};
+
+// The recorder's side.
+class StreamCountersWriter {
+  public:
+    // Puts an empty table in place of an earlier recorder's. Throws std::system_error.
+    explicit StreamCountersWriter(const base::Installation& installation);
+
+    // In place of what was written before; those beyond 1024 streams are left out.
+    void Write(const std::vector<StreamCounters>& streams);
+
+  private:
+    struct Table;
+    friend std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation);
+
+    MappedTable<Table> table_;
+};
+
+// What the recorder wrote last; nothing when none has run, or one of another version. A recorder that has ended leaves
+// its last numbers behind: check FindRecorder too.
+std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation);
+
+}  // namespace lookhaven::control
