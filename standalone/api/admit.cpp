@@ -68,7 +68,8 @@ CostClass CostClassOf(const Call& call) {
     if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || IsPlayer(call)) {
         return CostClass::kPictures;
     }
-    const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name;
+    const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name ||
+                          call.api == kSystemApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 

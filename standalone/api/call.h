@@ -15,6 +15,7 @@
 #include "standalone/control/slot_table.h"
 #include "standalone/http/answer.h"
 #include "standalone/http/request.h"
+#include "standalone/http/request_counters.h"
 
 namespace lookhaven::api {
 
@@ -35,7 +36,8 @@ struct Call {
 
     binding::RequestContext& context;
     control::SlotTable& slots;
-    control::Slot& slot;  // this process's
+    control::Slot& slot;                    // this process's
+    const http::RequestCounters& counters;  // of the moment when this process was forked
 
     // The parameter's value; null when it is missing.
     const Json::Value& Parameter(const std::string& name) const;

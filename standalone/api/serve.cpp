@@ -57,7 +57,7 @@ binding::TcpConnection ConnectionOf(const http::Request& request) {
 }
 
 // Cookie and session come first: nobody without a session may cost more than a short request.
-Call ReadCall(http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+Call ReadCall(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     Call call{.request = request,
               .api = {},
               .method = {},
@@ -66,7 +66,8 @@ Call ReadCall(http::Request& request, control::SlotTable& slots, control::Slot& 
               .login = {},
               .context = binding::RequestContext::Current(),
               .slots = slots,
-              .slot = slot};
+              .slot = slot,
+              .counters = service.counters};
     call.login = FindLogin(call);
     if (!call.login && request.body.size() + request.unread_body_bytes > kMaxBodyWithoutSession) {
         throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401,
@@ -121,6 +122,7 @@ std::string RunModule(EntryFunction entry, const Call& call) {
 // The store's refusals of a change become failures that the caller is told.
 std::string RunMethod(const OwnApi& api, const Call& call) {
     const Method& method = api.Find(call.version, call.method);
+    control::SlotTable::SetCall(call.slot, call.api + '/' + call.method);
     if (method.effect == Method::Effect::kChanges && call.request.Header("REQUEST_METHOD") != "POST") {
         throw Failure(405, "this method takes POST only");
     }
@@ -142,12 +144,13 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     if (const std::string_view method = request.Header("REQUEST_METHOD"); method != "GET" && method != "POST") {
         throw Failure(405, "GET and POST only");
     }
-    Call call = ReadCall(request, slots, slot);
+    Call call = ReadCall(service, request, slots, slot);
     const OwnApi* own = FindOwnApi(call.api);
     const EntryFunction entry = own == nullptr ? service.modules.Find(call.api, call.version, call.method) : nullptr;
     if (own == nullptr && entry == nullptr) {
         throw Failure(404, "no such api, version or method");
     }
+    control::SlotTable::SetCall(slot, entry != nullptr ? call.api + '/' + call.method : call.api);
     if (CostClassOf(call) == CostClass::kPictures) {
         LimitAddressSpace(kMaxAddressSpaceForPictures);
     }
@@ -168,23 +171,28 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
 
 std::string ServeOrFail(const Service& service, http::Request& request, control::SlotTable& slots,
                         control::Slot& slot) {
+    const auto fail = [&slot](const Failure& failure) {
+        slot.status = failure.Status();
+        return http::FailureAnswer(failure);
+    };
     try {
+        slot.status = 200;
         return Serve(service, request, slots, slot);
     } catch (const Failure& failure) {
-        return http::FailureAnswer(failure);
+        return fail(failure);
     } catch (const Json::Exception&) {
-        return http::FailureAnswer(Failure(400, "a parameter has the wrong type"));
+        return fail(Failure(400, "a parameter has the wrong type"));
     } catch (const std::bad_alloc&) {
-        return http::FailureAnswer(Failure(500, "the answer needs too much memory; ask for less at once"));
+        return fail(Failure(500, "the answer needs too much memory; ask for less at once"));
     } catch (const store::StoreError& error) {
         base::LogError(std::string("the request failed: ") + error.what());
-        return http::FailureAnswer(Failure(500, kStoreFailed));
+        return fail(Failure(500, kStoreFailed));
     } catch (const std::exception& error) {
         base::LogError(std::string("the request failed: ") + error.what());
     } catch (...) {
         base::LogError("the request failed: an exception of unknown type");
     }
-    return http::FailureAnswer(Failure(500, "the handler failed unexpectedly"));
+    return fail(Failure(500, "the handler failed unexpectedly"));
 }
 
 }  // namespace

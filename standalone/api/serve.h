@@ -12,6 +12,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
 #include "standalone/http/request.h"
+#include "standalone/http/request_counters.h"
 
 namespace lookhaven::api {
 
@@ -20,6 +21,7 @@ struct Service {
     const Modules& modules;
     RequestLimits limits;
     std::vector<sock_filter> playback_filter;  // PlaybackFilter(), made once for all
+    const http::RequestCounters& counters;
 };
 
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down

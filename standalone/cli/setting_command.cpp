@@ -7,6 +7,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/secret.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::cli {
@@ -31,7 +32,7 @@ constexpr Column kColumns[] = {{"setting", "setting"}, {"value", "value"}, {"mea
 
 struct Request {
     int value = 0;
-    std::string cms;
+    std::string word;
 };
 
 void Show(const Console& console) {
@@ -55,9 +56,18 @@ void Set(const Console& console, const Setting& setting, int value) {
 
 void SetCms(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    store::Settings(store).Set("cms", request.cms);
-    const bool on = request.cms == "on";
+    store::Settings(store).Set("cms", request.word);
+    const bool on = request.word == "on";
     console.Answer(Object("cms", on), "This host ", on ? "manages" : "does not manage", " its recording servers.");
+}
+
+void SetMonitorToken(const Console& console, const Request& request) {
+    constexpr std::size_t kTokenBytes = 24;
+    const bool is_new = request.word == "new";
+    const std::string token = is_new ? store::RandomHex(kTokenBytes) : "";
+    store::Store store = console.OpenStore();
+    store::Settings(store).Set(store::kMonitorTokenSetting, is_new ? store::Digest(token) : "");
+    console.Answer(Object("token", token), is_new ? token : "Monitors on other machines are refused.");
 }
 
 }  // namespace
@@ -73,7 +83,10 @@ void AddSetting(CLI::App& program, const Console& console) {
     }
     CommandGroup<Request> role(program, console, "set", "The role of this host");
     role.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
-        .Option("value", role.request().cms, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
+        .Option("value", role.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
+    role.Add("monitor-token", "With it a monitor on another machine may ask for /healthz and /metrics", SetMonitorToken)
+        .Option("value", role.request().word, "new: replaces it and prints it, once; off: removes it", Required,
+                Satisfies(CLI::IsMember({"new", "off"})));
 }
 
 }  // namespace lookhaven::cli

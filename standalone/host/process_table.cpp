@@ -101,13 +101,21 @@ void ProcessTable::Reap(pid_t pid) {
     if (found == processes_.end() || ::waitpid(pid, &status, WNOHANG) != pid) {
         return;
     }
-    if (WIFSIGNALED(status) && WTERMSIG(status) != SIGTERM) {
+    const bool is_crash = WIFSIGNALED(status) && WTERMSIG(status) != SIGTERM;
+    if (is_crash) {
         base::LogError("request process " + std::to_string(pid) + " died of signal " +
                        std::to_string(WTERMSIG(status)));
     }
+    Count(found->second, is_crash);
     Sweep(pid, *found->second.slot);
     slots_.Free(*found->second.slot);
     processes_.erase(found);
+}
+
+void ProcessTable::Count(const Process& process, bool is_crash) {
+    const control::Slot& slot = *process.slot;
+    counters_.NoteServed(control::CallOf(slot), is_crash ? 0 : slot.status.load(), slot.is_stream,
+                         std::chrono::duration_cast<std::chrono::microseconds>(Clock::now() - process.began));
 }
 
 void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {

@@ -21,6 +21,7 @@
 
 #include "standalone/base/file_descriptor.h"
 #include "standalone/control/slot_table.h"
+#include "standalone/http/request_counters.h"
 
 namespace lookhaven::host {
 
@@ -34,10 +35,12 @@ struct ProcessLimits {
 
 class ProcessTable {
   public:
-    // Borrows the slots; progress_folder: where players keep their progress files.
-    ProcessTable(ProcessLimits limits, control::SlotTable& slots, std::filesystem::path progress_folder)
+    // Borrows slots and counters; progress_folder: where players keep their progress files.
+    ProcessTable(ProcessLimits limits, control::SlotTable& slots, http::RequestCounters& counters,
+                 std::filesystem::path progress_folder)
         : limits_(limits),
           slots_(slots),
+          counters_(counters),
           progress_folder_(std::move(progress_folder)) {}
 
     struct Started {
@@ -56,7 +59,7 @@ class ProcessTable {
     void EndMarked();
     // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
-    // The process has ended: sweeps what it left and frees its slot.
+    // The process has ended: counts its request, sweeps what it left and frees its slot.
     void Reap(pid_t pid);
 
     // Sends what is due; returns when to come again.
@@ -75,6 +78,7 @@ class ProcessTable {
     };
 
     static void BeginEnding(Process& process);
+    void Count(const Process& process, bool is_crash);
     void Sweep(pid_t pid, const control::Slot& slot) const;
     void SignalPlayers(Clock::time_point now);
     Clock::time_point SignalExcess(Clock::time_point now);
@@ -82,6 +86,7 @@ class ProcessTable {
 
     ProcessLimits limits_;
     control::SlotTable& slots_;
+    http::RequestCounters& counters_;
     std::filesystem::path progress_folder_;
     Clock::time_point players_due_ = Clock::time_point::max();
     std::map<pid_t, Process> processes_;

@@ -55,11 +55,12 @@ base::FileDescriptor BlockSignals() {
 }  // namespace
 
 Server::Server(const base::Installation& installation, Callbacks callbacks, Listener& listener,
-               const ServerLimits& limits)
+               http::RequestCounters& counters, const ServerLimits& limits)
     : callbacks_(std::move(callbacks)),
       limits_(limits),
+      counters_(counters),
       slots_(limits.requests),
-      processes_(limits.processes, slots_, installation.ProgressFolder()),
+      processes_(limits.processes, slots_, counters, installation.ProgressFolder()),
       listener_(listener),
       poll_(::epoll_create1(EPOLL_CLOEXEC)),
       signals_(BlockSignals()) {
@@ -174,6 +175,7 @@ void Server::Read(int socket) {
 // The connection stays open for a moment and its further bytes are dropped: closing at once would reset it, and the
 // client might lose the answer.
 void Server::Refuse(Connection& connection, int status, const std::string& message) {
+    counters_.NoteRefused(status);
     const std::string answer =
         http::FailureAnswer(http::Failure(status, message, status == 503 ? http::kRetrySoonSeconds : 0));
     ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);

@@ -22,6 +22,7 @@
 #include "standalone/host/process_table.h"
 #include "standalone/host/scgi.h"
 #include "standalone/http/request.h"
+#include "standalone/http/request_counters.h"
 
 namespace lookhaven::host {
 
@@ -45,9 +46,10 @@ struct ServerLimits {
 
 class Server {
   public:
-    // Borrows the listener, and closes it when it stops to serve. Removes what players of a killed host left in the
+    // Borrows the listener, and closes it when it stops to serve, and the counters. Removes what players of a killed host left in the
     // installation's folder of progress files. Blocks all signals of the process. Throws std::system_error.
-    Server(const base::Installation& installation, Callbacks callbacks, Listener& listener, const ServerLimits& limits);
+    Server(const base::Installation& installation, Callbacks callbacks, Listener& listener,
+           http::RequestCounters& counters, const ServerLimits& limits);
 
     // Serves until SIGTERM or SIGINT, then ends the request processes and returns when the last is gone.
     void Run();
@@ -76,6 +78,7 @@ class Server {
 
     const Callbacks callbacks_;
     ServerLimits limits_;
+    http::RequestCounters& counters_;
     control::SlotTable slots_;
     ProcessTable processes_;
     std::map<int, Connection> connections_;

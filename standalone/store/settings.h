@@ -12,6 +12,9 @@
 
 namespace lookhaven::store {
 
+// Its value is the digest of a token with which a monitor on another machine may ask for health and metrics.
+constexpr const char* kMonitorTokenSetting = "monitor_token";
+
 class Settings {
   public:
     // The store must outlive this object.

@@ -80,7 +80,9 @@ void Run(const Options& options) {
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));
-    const api::Service service{installation, modules, options.requests, api::PlaybackFilter(installation.StoreUrl())};
+    http::RequestCounters counters;
+    const api::Service service{installation, modules, options.requests, api::PlaybackFilter(installation.StoreUrl()),
+                               counters};
     api::SessionFilter filter;
     const host::Callbacks callbacks{
         .serve_request =
@@ -90,7 +92,7 @@ void Run(const Options& options) {
             },
         .watch_sessions = [&](control::SlotTable& slots) { api::WatchSessions(installation, slots, filter); },
         .may_have_session = [&](const http::Request& request) { return filter.MayHaveSession(request); }};
-    host::Server server(installation, callbacks, listener, options.limits);
+    host::Server server(installation, callbacks, listener, counters, options.limits);
     base::LogInfo("serving on " + listener.Name());
     server.Run();
 }

@@ -45,6 +45,8 @@ POST Playback.Pause timestamp=1 on=true                               E      E  
 POST Playback.CheckOwner timestamp=1                                  E      E     N       N     N    N       N        N      N       E
 POST Playback.Stop timestamp=1                                        E      E     N       N     N    N       N        N      N       E
 Relay.Play server=2 camera={camera}                                   E      E     S/N     N     D/N  S/N     S/N      S/N    S/N     E
+System.Health                                                         D      D     D       D     D    D       D        D      D       D
+System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
 Player.LoadCamera: camera                                             E      E     D       O     D    D       D        D      D       E
 Player.SearchAvaiDate cameralists={camera} start=-1d day_count=2: day E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Player.EnumEvent cameralists={camera} from=-1d to=now: event          E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E

@@ -1,0 +1,248 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/metrics.h"
+
+#include <chrono>
+#include <fstream>
+#include <map>
+#include <optional>
+#include <sstream>
+#include <system_error>
+#include <vector>
+
+#include "standalone/api/health.h"
+#include "standalone/api/metrics_text.h"
+#include "standalone/base/clock.h"
+#include "standalone/control/common_config.h"
+#include "standalone/control/stream_counters.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/mount_status.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/settings.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+using Streams = std::vector<control::StreamCounters>;
+
+// A family with a sample for each stream, or for each recorded one.
+template <typename Value>
+void AddStreams(MetricsText& text, const Streams& streams, const char* name, const char* type, const char* help,
+                bool recorded_only, Value value) {
+    text.Family(name, type, help);
+    for (const control::StreamCounters& each : streams) {
+        if (each.is_recorded || !recorded_only) {
+            text.Sample(value(each), {{"camera", std::to_string(each.stream.camera)},
+                                      {"stream", std::to_string(each.stream.stream)}});
+        }
+    }
+}
+
+void AddRecorder(MetricsText& text, const base::Installation& installation) {
+    const bool is_alive = control::FindRecorder(installation) == control::RecorderState::kAlive;
+    text.Family("lookhaven_recorder_up", "gauge", "Whether the recorder runs and does not hang.");
+    text.Sample(is_alive ? 1 : 0);
+    const Streams streams = is_alive ? control::ReadStreamCounters(installation).value_or(Streams()) : Streams();
+    const double now_us = static_cast<double>(base::MonotonicMicros());
+    using Counters = control::StreamCounters;
+    AddStreams(text, streams, "lookhaven_stream_up", "gauge", "Whether a picture came within the last ten seconds.",
+               false, [&](const Counters& each) {
+                   const double age_us = now_us - static_cast<double>(each.last_picture_us);
+                   return each.pictures > 0 && age_us <= kMaxPictureAgeUs ? 1 : 0;
+               });
+    AddStreams(text, streams, "lookhaven_stream_pictures_total", "counter", "Pictures that came from the camera.",
+               false, [](const Counters& each) { return static_cast<double>(each.pictures); });
+    AddStreams(text, streams, "lookhaven_stream_bytes_total", "counter", "Bytes of pictures and sound that came.",
+               false, [](const Counters& each) { return static_cast<double>(each.bytes); });
+    AddStreams(text, streams, "lookhaven_stream_connections_total", "counter", "Attempts to reach the camera.", false,
+               [](const Counters& each) { return static_cast<double>(each.connections); });
+    AddStreams(text, streams, "lookhaven_recording_dropped_pictures_total", "counter",
+               "Pictures that were not recorded because the disk was too slow.", true,
+               [](const Counters& each) { return static_cast<double>(each.dropped_pictures); });
+    AddStreams(text, streams, "lookhaven_recording_queue_bytes", "gauge", "Bytes that wait for the disk.", true,
+               [](const Counters& each) { return static_cast<double>(each.queued_bytes); });
+    AddStreams(text, streams, "lookhaven_recording_lag_seconds", "gauge",
+               "How old the newest picture is that the disk has, but for half a second.", true,
+               [&](const Counters& each) { return (now_us - static_cast<double>(each.written_us)) / 1e6; });
+}
+
+struct MountFigures {
+    store::Mount mount;
+    bool is_up = false;
+    maintenance::MountSpace space;
+    std::optional<std::int64_t> oldest_s;
+};
+
+std::vector<MountFigures> LookAtMounts(const base::Installation& installation, store::Store& records) {
+    std::map<int, maintenance::MountState> states;
+    for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
+        states.emplace(status.mount, status.state);
+    }
+    std::vector<MountFigures> mounts;
+    for (const store::Mount& mount : store::Mounts(records).List()) {
+        MountFigures& figures = mounts.emplace_back();
+        figures.mount = mount;
+        const auto oldest = store::Events(records).InRecordingOrder(mount.id, store::Event(), 1);
+        figures.oldest_s = oldest.empty() ? std::nullopt : std::optional(oldest.front().start_s);
+        try {
+            if (const auto folder = maintenance::OpenMount(records, mount)) {
+                figures.space = folder->Space();
+                const auto state = states.find(mount.id);
+                figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady;
+            }
+        } catch (const std::system_error&) {
+            figures.is_up = false;  // and why, the health says
+        }
+    }
+    return mounts;
+}
+
+void AddMounts(MetricsText& text, const base::Installation& installation, store::Store& records) {
+    const std::vector<MountFigures> mounts = LookAtMounts(installation, records);
+    const auto add = [&](const char* name, const char* help, const auto& value) {
+        text.Family(name, "gauge", help);
+        for (const MountFigures& each : mounts) {
+            if (const std::optional<double> number = value(each)) {
+                text.Sample(*number, {{"mount", std::to_string(each.mount.id)}, {"name", each.mount.name}});
+            }
+        }
+    };
+    const auto space = [](std::int64_t bytes) {
+        return [bytes](const MountFigures& each) {
+            return each.space.total_bytes > 0 ? std::optional(static_cast<double>(bytes)) : std::nullopt;
+        };
+    };
+    add("lookhaven_mount_up", "Whether the mount is enabled, its disk is there, and its maintenance succeeds.",
+        [](const MountFigures& each) { return std::optional(each.mount.enabled && each.is_up ? 1.0 : 0.0); });
+    add("lookhaven_mount_size_bytes", "Size of its file system.",
+        [&](const MountFigures& each) { return space(each.space.total_bytes)(each); });
+    add("lookhaven_mount_free_bytes", "What is free there.",
+        [&](const MountFigures& each) { return space(each.space.free_bytes)(each); });
+    add("lookhaven_mount_reserve_bytes", "What recording leaves free there.",
+        [&](const MountFigures& each) { return space(each.space.ReserveBytes())(each); });
+    add("lookhaven_mount_oldest_recording_timestamp_seconds", "When its oldest recording began that may be deleted.",
+        [](const MountFigures& each) {
+            return each.oldest_s ? std::optional(static_cast<double>(*each.oldest_s)) : std::nullopt;
+        });
+}
+
+void AddStore(MetricsText& text, store::Store* records) {
+    const std::int64_t begin_us = base::MonotonicMicros();
+    bool is_up = records != nullptr;
+    try {
+        if (is_up) {
+            store::Settings(*records).Revision();
+        }
+    } catch (const store::StoreError&) {
+        is_up = false;
+    }
+    text.Family("lookhaven_store_up", "gauge", "Whether the record store answers.");
+    text.Sample(is_up ? 1 : 0);
+    if (is_up) {
+        text.Family("lookhaven_store_latency_seconds", "gauge", "How long the record store took for one row.");
+        text.Sample(static_cast<double>(base::MonotonicMicros() - begin_us) / 1e6);
+    }
+}
+
+// "VEXO.Event/List": the API's name, and the method's where it is known.
+std::pair<std::string, std::string> SplitCall(const std::string& call) {
+    const std::size_t slash = call.find('/');
+    return slash == call.npos ? std::pair(call, std::string())
+                              : std::pair(call.substr(0, slash), call.substr(slash + 1));
+}
+
+void AddDurations(MetricsText& text, const http::RequestCounters& counters) {
+    text.Family("lookhaven_request_duration_seconds", "histogram",
+                "From the start of a request's process to its end, without streams.");
+    for (const auto& [call, counted] : counters.Calls()) {
+        const auto [api, method] = SplitCall(call);
+        std::uint64_t count = 0;
+        for (std::size_t i = 0; i < counted.durations.counts.size(); ++i) {
+            count += counted.durations.counts[i];
+            std::ostringstream bound;
+            i < http::RequestCounters::kBounds.size() ? bound << http::RequestCounters::kBounds[i] : bound << "+Inf";
+            text.Sample(static_cast<double>(count), {{"api", api}, {"method", method}, {"le", bound.str()}}, "_bucket");
+        }
+        text.Sample(counted.durations.sum_s, {{"api", api}, {"method", method}}, "_sum");
+        text.Sample(static_cast<double>(count), {{"api", api}, {"method", method}}, "_count");
+    }
+}
+
+void AddRequests(MetricsText& text, const http::RequestCounters& counters) {
+    text.Family("lookhaven_requests_total", "counter", "Requests by the status of their answer, or \"crash\".");
+    for (const auto& [call, counted] : counters.Calls()) {
+        const auto [api, method] = SplitCall(call);
+        for (const auto& [status, count] : counted.by_status) {
+            text.Sample(static_cast<double>(count),
+                        {{"api", api}, {"method", method}, {"code", status == 0 ? "crash" : std::to_string(status)}});
+        }
+    }
+    text.Family("lookhaven_refused_requests_total", "counter", "Requests refused before they had a process.");
+    for (const auto& [status, count] : counters.Refused()) {
+        text.Sample(static_cast<double>(count), {{"code", std::to_string(status)}});
+    }
+    AddDurations(text, counters);
+}
+
+// Kibibytes that only this process has; 0 once it is gone.
+std::int64_t PrivateKib(pid_t pid) {
+    std::ifstream rollup("/proc/" + std::to_string(pid) + "/smaps_rollup");
+    std::int64_t sum = 0;
+    for (std::string line; std::getline(rollup, line);) {
+        if (line.starts_with("Private_Clean:") || line.starts_with("Private_Dirty:")) {
+            sum += std::strtoll(line.c_str() + line.find(':') + 1, nullptr, 10);
+        }
+    }
+    return sum;
+}
+
+void AddViewers(MetricsText& text, const control::SlotTable& slots) {
+    struct Kind {
+        int viewers = 0;
+        std::int64_t private_kib = 0;
+    };
+    std::map<std::string, Kind, std::less<>> kinds;
+    int others = 0;
+    slots.VisitRunning([&](const control::Slot& slot) {
+        if (slot.is_stream) {
+            Kind& kind = kinds[std::string(control::CallOf(slot))];
+            ++kind.viewers;
+            kind.private_kib += PrivateKib(slot.pid);
+        } else {
+            ++others;
+        }
+    });
+    text.Family("lookhaven_viewers", "gauge", "Streams that run.");
+    for (const auto& [call, kind] : kinds) {
+        text.Sample(kind.viewers, {{"api", SplitCall(call).first}, {"method", SplitCall(call).second}});
+    }
+    text.Family("lookhaven_viewers_private_bytes", "gauge", "Memory that their processes do not share.");
+    for (const auto& [call, kind] : kinds) {
+        text.Sample(static_cast<double>(kind.private_kib) * 1024,
+                    {{"api", SplitCall(call).first}, {"method", SplitCall(call).second}});
+    }
+    text.Family("lookhaven_running_requests", "gauge", "Requests that run and are no streams, this one too.");
+    text.Sample(others);
+}
+
+}  // namespace
+
+std::string MetricsOf(const Call& call, store::Store* records) {
+    MetricsText text;
+    const base::Installation& installation = call.context.Installation();
+    AddRecorder(text, installation);
+    AddStore(text, records);
+    try {
+        if (records != nullptr) {
+            AddMounts(text, installation, *records);
+        }
+    } catch (const store::StoreError&) {
+        // lookhaven_store_up tells it
+    }
+    AddRequests(text, call.counters);
+    AddViewers(text, call.slots);
+    return text.Text();
+}
+
+}  // namespace lookhaven::api
