@@ -12,7 +12,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr std::array kNames{"ready", "not-mounted", "in-use", "failing"};
+constexpr std::array kNames{"ready", "not-mounted", "in-use", "failing", "space-held"};
 
 std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "mounts";

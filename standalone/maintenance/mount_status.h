@@ -19,9 +19,10 @@ enum class MountState {
     kNotMounted,  // its folder is missing or lacks its marker
     kInUse,       // the recorder of another state folder works on it
     kFailing,     // the reason says why; tried again with growing pauses
+    kSpaceHeld,   // what deleted recordings held does not come free, so none are deleted to make room
 };
 
-const char* NameOf(MountState state);  // "ready", "not-mounted", "in-use", "failing"
+const char* NameOf(MountState state);  // "ready", "not-mounted", "in-use", "failing", "space-held"
 
 struct MountStatus {
     int mount = 0;

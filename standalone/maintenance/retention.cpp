@@ -37,43 +37,36 @@ bool IsOlderThanLimit(const store::Mount& mount, const store::Event& event, std:
 
 class Retention {
   public:
-    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
-              AgeLimit age_limit)
+    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, const RetentionClock& clock)
         : store_(store),
           mount_(mount),
           folder_(folder),
           events_(store),
           marks_(store),
           mounts_(store),
-          now_s_(now_s),
-          has_age_limit_(age_limit == AgeLimit::kApplies && mount.max_age_s > 0) {}
+          clock_(clock),
+          now_s_(clock.now_s),
+          has_age_limit_(clock.age_limit == AgeLimit::kApplies && mount.max_age_s > 0) {}
 
-    RetentionResult Run() {
+    RetentionResult Run(DiskWatch& watch) {
         FinishDeletions();
+        const RetentionResult finished = deleted_;
         const MountSpace space = folder_.Space();
-        excess_bytes_ = ExcessBytes(space);
-        excess_files_ = ExcessFiles(space);
-        // Dated in the future: as old as what was recorded after them.
-        std::vector<store::Event> misdated;
-        store::Event after;
-        for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
-            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
-            std::vector<store::Event> chosen;
-            has_more = oldest.size() == kEventsAtOnce;
-            for (const store::Event& event : oldest) {
-                after = event;
-                if (IsInExcess(event) || IsExpired(event)) {
-                    std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
-                    chosen.push_back(event);
-                } else if (has_age_limit_ && event.end_s > now_s_) {
-                    misdated.push_back(event);
-                } else {
-                    // The limits are the mount's, so no younger event exceeds them either.
-                    has_more = false;
-                    break;
-                }
-            }
-            Delete(chosen);
+        const std::int64_t lacking_bytes = LackingBytes(space);
+        const std::int64_t lacking_files = LackingFiles(space);
+        const Room room = lacking_bytes > 0 || lacking_files > 0 ? MeasureRoom() : Room();
+        const std::int64_t allowed_bytes = watch.bytes.Allow(lacking_bytes, room.bytes, clock_.monotonic_us);
+        const std::int64_t allowed_files = watch.files.Allow(lacking_files, room.files, clock_.monotonic_us);
+        excess_bytes_ = std::max(BytesAboveLimit(), allowed_bytes);
+        excess_files_ = allowed_files;
+        DeleteOldest();
+        const Room left = allowed_bytes > 0 || allowed_files > 0 ? MeasureRoom() : Room();
+        if (allowed_bytes > 0) {
+            watch.bytes.NoteDeleted(deleted_.bytes - finished.bytes, room.bytes, left.bytes, clock_.monotonic_us);
+        }
+        if (allowed_files > 0) {
+            watch.files.NoteDeleted(kFilesOfEvent * (deleted_.events - finished.events), room.files, left.files,
+                                    clock_.monotonic_us);
         }
         return deleted_;
     }
@@ -117,20 +110,53 @@ class Retention {
     }
 
   private:
-    // Bytes to delete whatever their age.
-    std::int64_t ExcessBytes(const MountSpace& space) {
-        std::int64_t excess = 0;
-        if (mount_.max_bytes > 0) {
-            excess = events_.Content(mount_.id).size_bytes - mount_.max_bytes;
+    struct Room {  // as in SpaceWatch
+        std::int64_t bytes = 0;
+        std::int64_t files = 0;
+    };
+
+    Room MeasureRoom() {
+        const MountSpace space = folder_.Space();
+        const store::MountContent content = events_.Content(mount_.id);
+        return {space.free_bytes + content.size_bytes, space.free_files + kFilesOfEvent * content.events};
+    }
+
+    void DeleteOldest() {
+        // Dated in the future: as old as what was recorded after them.
+        std::vector<store::Event> misdated;
+        store::Event after;
+        for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
+            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
+            std::vector<store::Event> chosen;
+            has_more = oldest.size() == kEventsAtOnce;
+            for (const store::Event& event : oldest) {
+                after = event;
+                if (IsInExcess(event) || IsExpired(event)) {
+                    std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
+                    chosen.push_back(event);
+                } else if (has_age_limit_ && event.end_s > now_s_) {
+                    misdated.push_back(event);
+                } else {
+                    // The limits are the mount's, so no younger event exceeds them either.
+                    has_more = false;
+                    break;
+                }
+            }
+            Delete(chosen);
         }
-        if (space.free_bytes < 2 * space.ReserveBytes()) {
-            excess = std::max(excess, 3 * space.ReserveBytes() - space.free_bytes);
-        }
-        return excess;
+    }
+
+    std::int64_t BytesAboveLimit() {
+        return mount_.max_bytes > 0 ? events_.Content(mount_.id).size_bytes - mount_.max_bytes : 0;
+    }
+
+    // Of what the disk should have free.
+    static std::int64_t LackingBytes(const MountSpace& space) {
+        return space.free_bytes < 2 * space.ReserveBytes() ? 3 * space.ReserveBytes() - space.free_bytes : 0;
     }
 
     // Tiny files, as of a camera whose format changes all the time, fill a file system before their bytes do.
-    std::int64_t ExcessFiles(const MountSpace& space) const {
+    std::int64_t LackingFiles(const MountSpace& space) const {
         if (space.free_files >= 2 * space.ReserveFiles()) {
             return 0;
         }
@@ -146,7 +172,7 @@ class Retention {
         return is_in_excess;
     }
 
-    // The age limit. Run stops at the first event that is not expired, so the limit must be the same for all of a
+    // The age limit. DeleteOldest stops at the first event that is not expired, so the limit must be the same for all of a
     // mount.
     bool IsExpired(const store::Event& event) const {
         return has_age_limit_ && IsOlderThanLimit(mount_, event, now_s_);
@@ -249,6 +275,7 @@ class Retention {
     store::Events events_;
     store::Marks marks_;
     store::Mounts mounts_;
+    const RetentionClock clock_;
     const std::int64_t now_s_;
     const bool has_age_limit_;
     std::int64_t excess_bytes_ = 0;
@@ -290,14 +317,14 @@ RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mou
     }
 }
 
-RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
-                                 AgeLimit age_limit) {
+RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
+                                 DiskWatch& watch) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
-    return folder ? Retention(store, mount, *folder, now_s, age_limit).Run() : RetentionResult{};
+    return folder ? Retention(store, mount, *folder, clock).Run(watch) : RetentionResult{};
 }
 
 void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s) {
-    Retention(store, mount, folder, now_s, AgeLimit::kWaits).FinishDeletions();
+    Retention(store, mount, folder, {.now_s = now_s}).FinishDeletions();
 }
 
 }  // namespace lookhaven::maintenance

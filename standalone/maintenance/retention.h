@@ -9,12 +9,14 @@
 //               (3) Archived and growing events and those on unmounted mounts are kept.
 //               (4) A mark is removed with the last of its footage.
 //               (5) The oldest is what was recorded first, not what has the earliest date: clocks have been wrong.
+//               (6) A disk that stays full whatever is deleted does not cost more than what should have made room.
 // Thread safety One thread.
 #pragma once
 
 #include <cstdint>
 
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/space_watch.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/store.h"
 
@@ -29,13 +31,27 @@ struct RetentionResult {
 
 enum class AgeLimit { kApplies, kWaits };  // waits while the clock cannot be trusted
 
+struct RetentionClock {
+    std::int64_t now_s = 0;
+    AgeLimit age_limit = AgeLimit::kWaits;
+    std::int64_t monotonic_us = 0;
+};
+
+// What deleting gives back to a mount's disk; keep it from one pass to the next.
+struct DiskWatch {
+    SpaceWatch bytes;
+    SpaceWatch files;
+
+    bool IsHeld() const { return bytes.IsHeld() || files.IsHeld(); }
+};
+
 // Deletes events, the oldest first: those older than the mount's age limit, and as many as exceed its size limit or as
-// are needed to have three times the disk's reserve free once less than twice the reserve is. An event is kept while
-// one recorded before it is not old enough. The result is empty for a mount that is not mounted. Throws
-// store::StoreError; std::system_error for trouble with this mount, which says nothing about others: handle each mount
-// by itself, and try again later. The events deleted until then stay deleted.
-RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s,
-                                 AgeLimit age_limit);
+// are needed to have three times the disk's reserve free once less than twice the reserve is; for the latter no more
+// than the watch allows. An event is kept while one recorded before it is not old enough. The result is empty for a
+// mount that is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says
+// nothing about others: handle each mount by itself, and try again later. The events deleted until then stay deleted.
+RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
+                                 DiskWatch& watch);
 
 // Finishes the deletions that a crash interrupted on the mount. Throws as EnforceRetention.
 void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s);

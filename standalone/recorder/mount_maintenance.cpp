@@ -9,7 +9,6 @@
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/recovery.h"
-#include "standalone/maintenance/retention.h"
 
 namespace lookhaven::recorder {
 
@@ -23,10 +22,11 @@ constexpr std::int64_t kMaxPauseUs = 600'000'000;
 
 }  // namespace
 
-MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context)
+MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, bool is_space_held)
     : mount_id_(mount_id),
       context_(std::move(context)),
-      status_{mount_id, MountState::kReady, ""},
+      disk_watch_{maintenance::SpaceWatch(is_space_held), maintenance::SpaceWatch(is_space_held)},
+      status_{mount_id, is_space_held ? MountState::kSpaceHeld : MountState::kReady, ""},
       thread_(context_.store_url, "look after mount " + std::to_string(mount_id),
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -95,14 +95,21 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
         const maintenance::RetentionResult deleted = maintenance::EnforceRetention(
-            store, mount, clock.now_s,
-            clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits);
+            store, mount,
+            {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits, now_us},
+            disk_watch_);
         if (deleted.events > 0) {
             base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
                           " old events");
         }
     }
-    SetStatus(recovery_failure_.empty() ? MountState::kReady : MountState::kFailing, recovery_failure_);
+    if (!recovery_failure_.empty()) {
+        SetStatus(MountState::kFailing, recovery_failure_);
+    } else if (disk_watch_.IsHeld()) {
+        SetStatus(MountState::kSpaceHeld, mount.path);
+    } else {
+        SetStatus(MountState::kReady, "");
+    }
 }
 
 void MountMaintenance::SetStatus(MountState state, const std::string& reason) {
@@ -116,9 +123,10 @@ void MountMaintenance::SetStatus(MountState state, const std::string& reason) {
         base::LogInfo(name + " is looked after again");
     } else {
         base::LogWarning(name +
-                         (state == MountState::kFailing ? " fails: "
-                          : state == MountState::kInUse ? " is used by the recorder of another state folder: "
-                                                        : " is not there: ") +
+                         (state == MountState::kFailing     ? " fails: "
+                          : state == MountState::kInUse     ? " is used by the recorder of another state folder: "
+                          : state == MountState::kSpaceHeld ? " gets no space back from deleted recordings: "
+                                                            : " is not there: ") +
                          reason);
     }
 }

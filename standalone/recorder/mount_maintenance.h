@@ -17,6 +17,7 @@
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_lock.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/retention.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/mounts.h"
 
@@ -32,8 +33,9 @@ struct MaintenanceContext {
 
 class MountMaintenance {
   public:
-    // Starts the thread. Throws std::system_error when no thread can be started.
-    MountMaintenance(int mount_id, MaintenanceContext context);
+    // Starts the thread. is_space_held: an earlier recorder reported kSpaceHeld. Throws std::system_error when no
+    // thread can be started.
+    MountMaintenance(int mount_id, MaintenanceContext context, bool is_space_held);
 
     // Call every second: does what is due; does not wait. After a failure it pauses, longer after each.
     void Ask() { thread_.Ask(); }
@@ -72,6 +74,7 @@ class MountMaintenance {
     // Only the thread uses these.
     maintenance::ClockWatch clock_watch_;
     maintenance::MountLock lock_;
+    maintenance::DiskWatch disk_watch_;
     Pause after_failure_;
     Pause after_recovery_;
     std::int64_t next_retention_us_ = 0;

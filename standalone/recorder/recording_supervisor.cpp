@@ -32,8 +32,13 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                 lost_since_s_.emplace(status.camera, status.lost_since_s);
             }
         }
+        for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
+            if (status.state == maintenance::MountState::kSpaceHeld) {
+                held_mounts_.insert(status.mount);
+            }
+        }
     } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot read since when cameras are down: ") + failure.what());
+        base::LogWarning(std::string("cannot read how the recorder before left cameras and mounts: ") + failure.what());
     }
 }
 
@@ -218,9 +223,11 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
             Start("maintenance of mount " + std::to_string(id), [&, id = id] {
                 mounts_.emplace(
                     id, std::make_unique<MountMaintenance>(
-                            id, MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstReservedId(); },
-                                                   [this](const store::Mark& mark) { return FootageHasEnded(mark); },
-                                                   space_requests_}));
+                            id,
+                            MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstReservedId(); },
+                                               [this](const store::Mark& mark) { return FootageHasEnded(mark); },
+                                               space_requests_},
+                            held_mounts_.contains(id)));
             });
         }
         const auto mount = mounts_.find(id);

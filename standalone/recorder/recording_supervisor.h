@@ -8,6 +8,7 @@
 #include <atomic>
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -74,6 +75,7 @@ class RecordingSupervisor {
     std::map<std::string, std::string> reported_failures_;
     std::map<int, Entry> entries_;
     std::map<int, std::int64_t> lost_since_s_;                 // by camera; what an earlier recorder noticed included
+    std::set<int> held_mounts_;                                // whose space did not come back, at the start
     std::map<int, std::unique_ptr<MountMaintenance>> mounts_;  // by id
     StoreThread missed_marks_;
     bool stores_last_rows_ = false;

@@ -61,7 +61,7 @@ class RetentionTest : public testing::Test {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
-        return EnforceRetention(footage_.Records(), mount, kNow, age_limit);
+        return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_);
     }
 
     std::vector<int> Left() {
@@ -81,6 +81,8 @@ class RetentionTest : public testing::Test {
 
     const test::TemporaryFolder folder_;
     test::Footage footage_{MakeStore(folder_), folder_};
+    std::int64_t now_us_ = 0;
+    DiskWatch watch_;
 };
 
 TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
@@ -144,6 +146,54 @@ TEST_F(RetentionTest, NothingGoesForAFileSystemThatReportsNonsense) {
     }
     g_lie = [](auto& report) { report.f_bavail = 0; };
     EXPECT_EQ(Run(0).events, 1) << "full";
+    g_lie = {};
+}
+
+TEST_F(RetentionTest, ADiskThatGetsNoSpaceBackLosesNoMoreThanWasNeeded) {
+    int recorded = 0;
+    const auto record = [&](int count) {
+        for (; count > 0; --count) {
+            footage_.Record(1, kNoon + 60 * recorded++, 60);
+        }
+    };
+    // 100 MiB; twice the reserve is 4 MiB, and 6 MiB are to be free.
+    std::int64_t free_bytes = 3 << 20;
+    g_lie = [&](auto& report) {
+        report.f_blocks = (100 << 20) / report.f_frsize;
+        report.f_bavail = static_cast<fsblkcnt_t>(free_bytes) / report.f_frsize;
+    };
+    const struct {
+        int at_s, freed, recorded, deleted;
+        bool is_held;
+        const char* what;
+    } rows[] = {
+        {0, 0, 20, 2, false, "what is needed"},
+        {50, 0, 0, 0, false, "it may yet come"},
+        {55, 0, 2, 2, false, "it came, and was recorded to"},
+        {100, 2, 0, 0, false, "it comes late"},
+        {110, -2, 0, 2, false, "in vain"},
+        {171, 0, 0, 1, true, "one, to see"},
+        {290, 0, 0, 0, true, "not every minute"},
+        {292, 0, 0, 1, true, "another"},
+        {10'000, 0, 0, 1, true, ""},
+        {20'000, 0, 0, 1, true, ""},
+        {30'000, 0, 0, 1, true, ""},
+        {40'000, 0, 0, 1, true, ""},
+        {43'599, 0, 0, 0, true, "every hour"},
+        {43'601, 0, 0, 1, true, ""},
+        {43'611, 8, 0, 0, false, "the snapshot is removed"},
+        {43'621, -8, 0, 2, false, "full again"},
+    };
+    for (const auto& row : rows) {
+        now_us_ = std::int64_t{1'000'000} * row.at_s;
+        free_bytes += row.freed * kEventBytes;
+        record(row.recorded);
+        EXPECT_EQ(Run(0).events, row.deleted) << row.at_s << " s: " << row.what;
+        EXPECT_EQ(watch_.IsHeld(), row.is_held) << row.at_s << " s: " << row.what;
+    }
+    watch_ = {SpaceWatch(true), SpaceWatch(true)};
+    EXPECT_EQ(Run(0).events, 1) << "after a restart";
+    EXPECT_EQ(Run(static_cast<int>(Left().size() - 1) * kEventBytes).events, 1) << "for the mount's own limit";
     g_lie = {};
 }
 
