@@ -166,12 +166,17 @@ void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     Camera camera = RequireCamera(cameras, request.id);
-    const int live_profile_before = camera.live_profile;
+    const Camera before = camera;
     request.options.ApplyTo(camera);
     RequireSources(camera);
     const std::optional<store::Credentials> credentials = AskCredentials(request);
-    if (camera.live_profile != live_profile_before || request.options.HasSource(camera.live_profile)) {
+    const bool has_new_source =
+        camera.live_profile != before.live_profile || request.options.HasSource(camera.live_profile);
+    if (has_new_source || credentials) {
         ProbeMissing(camera, request, request.account ? credentials : cameras.FindCredentials(camera.id));
+    }
+    if (!has_new_source && !request.options.HasAudio()) {
+        camera.audio = before.audio;  // the owner's choice
     }
     RecordingPlan plan = RecordingPlans(store).Find(camera.id);
     request.recording.ApplyTo(plan);
