@@ -3,7 +3,7 @@
 // Cameras: whether they send pictures, whether these are recorded, and the shared memory that they pass through.
 #include <algorithm>
 #include <exception>
-#include <optional>
+#include <map>
 
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/console.h"
@@ -26,23 +26,25 @@ std::string TitleOf(const RecordingStatus& status) {
     return Concat("camera ", status.camera, " (", status.camera_name, ")");
 }
 
-// The option for the address of the profile that the live view shows.
-std::string LiveSourceOption(const base::Installation& installation, int camera_id) {
+// By camera, the option for the address of the profile that the live view shows; of those where it is not --source.
+std::map<int, std::string> LiveSourceOptions(const base::Installation& installation) {
+    std::map<int, std::string> options;
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
-        const std::optional<store::Camera> camera = store::Cameras(store).Find(camera_id);
-        for (const auto& [name, number] : ProfileNames()) {
-            if (camera && number == camera->live_profile && number != 0) {
-                return "--" + name + "-source";
+        for (const store::Camera& camera : store::Cameras(store).List()) {
+            for (const auto& [name, number] : ProfileNames()) {
+                if (number == camera.live_profile && number != 0) {
+                    options.emplace(camera.id, "--" + name + "-source");
+                }
             }
         }
     } catch (const std::exception&) {
         // CheckStore reports it
     }
-    return "--source";
+    return options;
 }
 
-std::string RemedyOf(const base::Installation& installation, const RecordingStatus& status) {
+std::string RemedyOf(const RecordingStatus& status, const std::string& source_option) {
     switch (status.loss) {
     case SignalLoss::kWrongPassword:
         return Concat("lookhaven camera set ", status.camera, " --account ACCOUNT");
@@ -53,16 +55,17 @@ std::string RemedyOf(const base::Installation& installation, const RecordingStat
     case SignalLoss::kUnknownHost:
     case SignalLoss::kUnreachable:
         return Concat("switch the camera on, or, if its address or port has changed: lookhaven camera set ",
-                      status.camera, " ", LiveSourceOption(installation, status.camera), " ADDRESS");
+                      status.camera, " ", source_option, " ADDRESS");
     default:
         return Concat("restart the camera, and see what it sends: lookhaven camera probe ", status.camera);
     }
 }
 
-Finding NoSignal(const base::Installation& installation, const RecordingStatus& status) {
+Finding NoSignal(const RecordingStatus& status, const std::map<int, std::string>& source_options) {
+    const auto option = source_options.find(status.camera);
     return {Concat(TitleOf(status), " has sent no picture since ", FormatMoment(status.lost_since_s), ": ",
                    base::NameOf(status.loss), " (", status.loss_reason, ")"),
-            RemedyOf(installation, status)};
+            RemedyOf(status, option == source_options.end() ? "--source" : option->second)};
 }
 
 bool IsPaused(RecordingState state) {
@@ -99,9 +102,12 @@ Findings CheckRecordings(const base::Installation& installation) {
         return {};  // stale
     }
     Findings findings;
-    for (const RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+    const std::vector<RecordingStatus> cameras = maintenance::ReadRecordingStatus(installation);
+    const bool is_one_down = std::ranges::any_of(cameras, [](const auto& status) { return status.lost_since_s > 0; });
+    const auto source_options = is_one_down ? LiveSourceOptions(installation) : std::map<int, std::string>();
+    for (const RecordingStatus& status : cameras) {
         if (status.lost_since_s > 0) {
-            findings.push_back(NoSignal(installation, status));
+            findings.push_back(NoSignal(status, source_options));
         }
         if (IsPaused(status.state)) {
             const bool lacks_event_id = status.state == RecordingState::kNoEventId;

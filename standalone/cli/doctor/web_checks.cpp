@@ -109,7 +109,7 @@ Findings CheckCertificate(const base::Installation& installation) {
     }
     const std::string remedy =
         "put a valid certificate.pem and key.pem there and restart the server; a self-signed one that "
-        "script/server made is renewed when it restarts";
+        "script/server made is replaced when it restarts";
     try {
         const std::int64_t end_s = remote::CertificateEnd(base::ReadFile(path));
         const std::int64_t left_s = end_s - base::WallSeconds();
