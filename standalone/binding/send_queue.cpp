@@ -17,8 +17,6 @@
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 
-#include "standalone/base/clock.h"
-
 namespace lookhaven::binding {
 
 namespace {
@@ -63,7 +61,10 @@ std::optional<Request> RequestFor(const TcpConnection& connection) {
 
 }  // namespace
 
-SendQueue::SendQueue(int socket, TcpConnection connection) : socket_(socket), connection_(std::move(connection)) {}
+SendQueue::SendQueue(int socket, TcpConnection connection, std::function<std::int64_t()> now_us)
+    : socket_(socket),
+      connection_(std::move(connection)),
+      now_us_(std::move(now_us)) {}
 
 std::int64_t SendQueue::WaitingBytes() const {
     int bytes = 0;
@@ -137,7 +138,7 @@ bool SendQueue::IsDrainedNow(std::int64_t now_us) {
 }
 
 bool SendQueue::IsDrained() {
-    const std::int64_t now_us = base::MonotonicMicros();
+    const std::int64_t now_us = now_us_();
     if (IsDrainedNow(now_us)) {
         ++drained_in_a_row_;
         long_since_us_.reset();
@@ -149,7 +150,7 @@ bool SendQueue::IsDrained() {
 }
 
 bool SendQueue::TakeOverdueTurn() {
-    if (!long_since_us_ || base::MonotonicMicros() - *long_since_us_ < kMaxWaitUs) {
+    if (!long_since_us_ || now_us_() - *long_since_us_ < kMaxWaitUs) {
         return false;
     }
     long_since_us_.reset();

@@ -11,10 +11,12 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 
 #include "platform/export.h"
+#include "standalone/base/clock.h"
 #include "standalone/base/file_descriptor.h"
 
 namespace lookhaven::binding {
@@ -31,7 +33,7 @@ class LH_PLATFORM_API SendQueue {
   public:
     // socket: the connection to the web server, borrowed. A TCP connection that does not exist counts as one without a
     // queue.
-    SendQueue(int socket, TcpConnection connection);
+    SendQueue(int socket, TcpConnection connection, std::function<std::int64_t()> now_us = base::MonotonicMicros);
 
     // Whether what is sent now arrives soon: little waits, or no more than the viewer has lately taken within 100 ms.
     bool IsDrained();
@@ -53,6 +55,7 @@ class LH_PLATFORM_API SendQueue {
 
     int socket_;
     TcpConnection connection_;
+    const std::function<std::int64_t()> now_us_;
     base::FileDescriptor netlink_;
     bool has_opened_netlink_ = false;
     std::int64_t measured_us_ = 0;     // when the present interval began …

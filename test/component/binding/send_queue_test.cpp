@@ -85,6 +85,24 @@ TEST_F(SendQueueTest, KnowsWhatIsStillOnItsWay) {
     EXPECT_TRUE(unknown.IsDrained());
 }
 
+TEST_F(SendQueueTest, TheSlowestViewerGetsAPictureEveryTenSeconds) {
+    std::int64_t now_ms = 1;
+    SendQueue queue(server_.Get(), {"203.0.113.1", 1, "203.0.113.1", 2}, [&] { return 1000 * now_ms; });
+    std::array<char, 100'000> block{};
+    ASSERT_GT(send(server_.Get(), block.data(), block.size(), MSG_DONTWAIT), 65'536);
+    std::string turns;
+    for (; now_ms < 35'000; now_ms += 500) {
+        EXPECT_FALSE(queue.IsDrained());
+        turns += queue.TakeOverdueTurn() ? std::to_string(now_ms / 1000) + " " : "";
+    }
+    EXPECT_EQ(turns, "10 20 31 ");
+    while (recv(client_.Get(), block.data(), block.size(), MSG_DONTWAIT) > 0) {
+    }
+    EXPECT_TRUE(queue.IsDrained());
+    now_ms += 60'000;
+    EXPECT_FALSE(queue.TakeOverdueTurn()) << "it is drained";
+}
+
 TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFrame) {
     SendQueue queue(server_.Get(), {"203.0.113.1", 1, "203.0.113.1", 2});
     RequestContext::Current().SetQueue(&queue);
