@@ -7,14 +7,34 @@
 #include <csignal>
 #include <random>
 
+#include <dlfcn.h>
+#include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 
 #include "standalone/base/process.h"
+#include "standalone/host/child.h"
 #include "standalone/host/listener.h"
 #include "standalone/store/users.h"
 #include "test/component/host/running_host.h"
 #include "test/support/host/scgi_bytes.h"
+#include "test/support/process.h"
+
+namespace {
+
+bool g_refuses_close_range = false;
+
+}  // namespace
+
+// In the place of the C library's: an old kernel.
+extern "C" int close_range(unsigned int first, unsigned int last, int flags) noexcept {
+    static const auto real = reinterpret_cast<decltype(&close_range)>(::dlsym(RTLD_NEXT, "close_range"));
+    if (g_refuses_close_range) {
+        errno = ENOSYS;
+        return -1;
+    }
+    return real(first, last, flags);
+}
 
 namespace lookhaven::host {
 namespace {
@@ -106,6 +126,26 @@ TEST(Host, TakesItsProcessesAlong) {
             EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
             EXPECT_FALSE(std::filesystem::exists(socket));
         }
+    }
+}
+
+TEST(LeaveHost, ClosesWhatTheHostHasOpenOnOldKernelsToo) {
+    control::SlotTable slots(1);
+    const base::FileDescriptor connection(::open("/dev/null", O_RDONLY));
+    const base::FileDescriptor high(::fcntl(connection.Get(), F_DUPFD, 700));
+    ASSERT_GE(high.Get(), 700);
+    for (const bool refuses : {false, true}) {
+        g_refuses_close_range = refuses;
+        const int left = WEXITSTATUS(test::WaitFor(test::InChild([&, host = ::getpid()] {
+            LeaveHost(host, slots, connection.Get());
+            int open = 0;
+            for (int descriptor = 0; descriptor < 1024; ++descriptor) {
+                open += ::fcntl(descriptor, F_GETFD) >= 0 ? 1 : 0;
+            }
+            ::_exit(open);
+        })));
+        EXPECT_EQ(left, 4) << "0, 1, 2 and the table's";
+        g_refuses_close_range = false;
     }
 }
 

@@ -1,15 +1,33 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maintenance of several mounts, one of which fails.
+// Maintenance of several mounts, one of which fails, and threads that cannot be had.
 #include "standalone/recorder/recording_supervisor.h"
 
+#include <cerrno>
+#include <limits>
+
+#include <dlfcn.h>
 #include <gtest/gtest.h>
+#include <pthread.h>
 
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/wait.h"
+
+namespace {
+
+int g_threads_left = std::numeric_limits<int>::max();
+
+}  // namespace
+
+// In the place of the C library's: a machine that is out of threads.
+extern "C" __attribute__((visibility("default"))) int
+pthread_create(pthread_t* thread, const pthread_attr_t* attributes, void* (*run)(void*), void* argument) noexcept {
+    static const auto real = reinterpret_cast<decltype(&pthread_create)>(::dlsym(RTLD_NEXT, "pthread_create"));
+    return g_threads_left-- > 0 ? real(thread, attributes, run, argument) : EAGAIN;
+}
 
 namespace lookhaven::recorder {
 namespace {
@@ -92,6 +110,29 @@ TEST_F(RecordingSupervisorTest, LooksAfterTheMountsBesideOneThatFails) {
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
     EXPECT_EQ(store::RecorderLease(store_).Current().holder, "") << "nobody need wait for it to expire";
+}
+
+TEST_F(RecordingSupervisorTest, AThreadThatCannotBeHadIsTriedAgainAndCostsNoOther) {
+    const int mount = AddMount(home_ / "disk", maintenance::MarkerFor(store_, 1).installation);
+    RecordingSupervisor supervisor(installation_, std::chrono::seconds(1));
+    CatalogContents catalog;
+    catalog.mounts = {{mount, true}};
+    for (const int camera : {1, 2, 3}) {
+        catalog.cameras[camera] = {"Camera", store::RecordMode::kAlways, 60, 0, 0, mount, home_ / "disk", "here"};
+    }
+    for (const int threads : {0, 2, 1, std::numeric_limits<int>::max()}) {
+        const std::size_t before = supervisor.NeededStreams().size();
+        g_threads_left = threads;
+        EXPECT_NO_THROW(supervisor.Reconcile(catalog));
+        EXPECT_EQ(supervisor.NeededStreams().size(), std::min<std::size_t>(3, before + static_cast<unsigned>(threads)));
+    }
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] {
+        supervisor.DoEverySecond({});
+        const auto mounts = maintenance::ReadMountStatus(installation_);
+        return mounts.size() == 1 && mounts[0].state == maintenance::MountState::kReady;
+    })) << "its maintenance was tried again, too";
+    supervisor.RequestStop();
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
 }
 
 }  // namespace
