@@ -20,6 +20,7 @@ class HostileHost(http.server.BaseHTTPRequestHandler):
     """Requests to a paired host whose every answer tries to steer the web server and the browser of the host that asks it."""
 
     content_type = "text/html"
+    ahead_s = 0
     HEADERS = {
         "Set-Cookie": "id=chosen-by-another; Path=/",
         "X-Accel-Redirect": "/webapi?api=VEXO.Auth&version=1&method=Status",
@@ -34,6 +35,13 @@ class HostileHost(http.server.BaseHTTPRequestHandler):
             self.send_header(name, value)
         self.end_headers()
         self.wfile.write(b"<script>evil()</script>")
+
+    def do_GET(self):
+        self.send_response(401)
+        self.end_headers()
+
+    def date_time_string(self, timestamp=None):
+        return super().date_time_string(time.time() + self.ahead_s)
 
     def log_message(self, *arguments):
         pass
@@ -184,6 +192,10 @@ class PairingTest(unittest.TestCase):
         for kind in ("text/html", "image/svg+xml", "image/jpeg\x7f", "multipart/mixed", "multipart/x-mixed-replacement", ""):
             HostileHost.content_type = kind
             self.assertEqual(self.relay(1, server=server).status, 502, kind)
+        for HostileHost.ahead_s, reason in (3630, "its clock is 60 minutes ahead of"), (-3630, "its clock is 60 minutes behind"), \
+                (0, "it does not let this host in: it knows another secret"):
+            with self.assertRaisesRegex(AssertionError, "Hostile failed: " + reason):
+                self.watcher.cli("server", "refresh")
         HostileHost.content_type = "Image/JPEG ; x=y"
         answer = self.relay(1, server=server)
         self.assertEqual(answer.body, b"<script>evil()</script>", "it came from the other host, not from a redirect here")

@@ -3,6 +3,8 @@
 # What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
 # through the web server, also while it is still being recorded; and a session's players give way to each other.
 import base64
+import contextlib
+import http.client
 import os
 import pathlib
 import re
@@ -178,6 +180,19 @@ class PlaybackTest(unittest.TestCase):
             self.assertEqual("".join(sorted(self.probe(answer.body, "stream=codec_type").splitlines(True))), streams)
             frames = self.probe(answer.body, "stream=nb_read_frames", "-count_frames", "-select_streams", "v")
             self.assertEqual(int(frames), event["frame_count"])
+
+    def test_a_download_that_fails_midway_is_seen_to_be_cut(self):
+        event = self.finished(1)
+        file = next(self.server.home.rglob(event["name"]))
+        whole = file.read_bytes()
+        connection, response = self.server.open(call("VEXO.Event", "Download", event=event["id"]), "admin")
+        with contextlib.closing(connection):
+            try:
+                os.truncate(file, len(whole) // 2)
+                with self.assertRaises(http.client.IncompleteRead):
+                    response.read()
+            finally:
+                file.write_bytes(whole)
 
     def probe(self, data, entries, *options):
         done = subprocess.run(

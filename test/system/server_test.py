@@ -5,6 +5,7 @@ import contextlib
 import os
 import pathlib
 import pwd
+import re
 import signal
 import socket
 import sqlite3
@@ -152,11 +153,16 @@ class ServerTest(unittest.TestCase):
                 with context.wrap_socket(plain, server_hostname="localhost") as secure:
                     self.assertEqual(secure.selected_alpn_protocol(), "h2")
 
-    def test_an_owners_certificate_is_left_alone(self):
+    def test_a_damaged_certificate_is_made_anew_but_an_owners_is_left_alone(self):
         with Installation() as server:
             folder = server.home / "tls"
             made = (folder / "certificate.pem").read_bytes()
             self.assertIn("CA:FALSE", said_by("openssl", "x509", "-noout", "-text", input=made))
+            server.stop()
+            (folder / "certificate.pem").write_bytes(b"")
+            server.start()
+            self.assertNotIn((folder / "certificate.pem").read_bytes(), (b"", made))
+            self.assertTrue((folder / "certificate.pem.damaged").exists())
             server.stop()
             make_certificate(folder, "owner", 1)
             owners = [(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")]
@@ -187,6 +193,19 @@ class ServerTest(unittest.TestCase):
                 self.assertNotEqual(wait_until(lambda: server.part(part) if server.part(part) != old else 0, 10, part), old)
             wait_until(server.answers, 10, "everything answers again")
             self.assertIn("recorder ended", server.said())
+
+    def test_however_often_a_part_ends_it_is_back_before_streams_give_up(self):
+        restart = re.search(r"^Restart\(\) \{.*?^\}", (ROOT / "script/server").read_text(), re.M | re.S)[0]
+        script = f"""declare -A pid started pause=([recorder]=0)
+            kill() {{ :; }}
+            Detach() {{ printf '%s ' "$2" >&2; sleep 0 & }}
+            {restart}
+            for lived in 0 0 0 0 0 0 59 60 0; do
+                pid[recorder]=1 started[recorder]=$((SECONDS - lived))
+                Restart recorder
+            done"""
+        done = subprocess.run(["bash", "-c", script], capture_output=True, text=True, check=True)
+        self.assertEqual(done.stderr, "1 2 4 8 8 8 8 1 2 ", done.stdout)
 
 
 if __name__ == "__main__":
