@@ -14,6 +14,7 @@ import random
 import signal
 import socket
 import sqlite3
+import struct
 import subprocess
 import sys
 import threading
@@ -21,11 +22,30 @@ import time
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 sys.path[:0] = [str(ROOT / "test/system"), str(ROOT / "bench")]
-from installation import LIVE, PASSWORDS, Installation, children, descendants, program, wait_until  # noqa: E402
+from installation import BUILD, LIVE, PASSWORDS, Installation, children, descendants, program, wait_until  # noqa: E402
 from postgres import Postgres  # noqa: E402
 
 MAX_LOST_S = 1.0  # of footage, by a killed recorder
 RESTART_S = 20  # within which viewers are promised new pictures
+CLOCKS_S = (0, 10, -10, 3600, -3600, 7200)  # ahead of the machine's
+
+
+class Clock:
+    """The wall clock of an installation, by shifted_clock.cpp."""
+
+    def __init__(self, server):
+        self._file = server.home.with_name("clock")
+        self.set(0)
+        library = BUILD / "lib/libshifted_clock.so"
+        server.environment.update(LD_PRELOAD=str(library), LOOKHAVEN_SHIFTED_CLOCK=str(self._file))
+
+    def set(self, ahead_s):
+        self.ahead_s = ahead_s
+        with open(self._file, "r+b" if self._file.exists() else "wb") as file:
+            file.write(struct.pack("=q", ahead_s))
+
+    def now_s(self):
+        return time.time() + self.ahead_s
 
 
 class Watcher:
@@ -69,8 +89,8 @@ def last_frame_s(recording):
 
 
 class Torture:
-    def __init__(self, server, postgres):
-        self.server, self.postgres = server, postgres
+    def __init__(self, server, postgres, clock):
+        self.server, self.postgres, self.clock = server, postgres, clock
         self.counts, self.lost, self.recorders = collections.Counter(), [], {server.part("recorder")}
         self._decoded = set()
         self.camera = self._add_camera("Tortured", server.cli("mount", "list", "--json"))
@@ -106,7 +126,7 @@ class Torture:
     def kill_recorder(self):
         connections = self.watcher.connections
         newest = self.recordings()[-1:]
-        killed_s = time.time()
+        killed_s = self.clock.now_s()
         os.kill(self.server.part("recorder"), signal.SIGKILL)
         last_s = last_frame_s(newest[0]) if newest else None
         if last_s is not None:
@@ -153,6 +173,15 @@ class Torture:
         os.kill(recorder, signal.SIGSTOP)
         time.sleep(random.uniform(0.1, 4))
         os.kill(recorder, signal.SIGCONT)
+
+    def step_clock(self):
+        self.clock.set(random.choice([ahead_s for ahead_s in CLOCKS_S if ahead_s != self.clock.ahead_s]))
+        kept = self.recordings()
+        wait_until(lambda: self.recordings()[-1] not in kept, RESTART_S, "it records under the new time")
+        recording = self.recordings()[-1]
+        wait_until(lambda: last_frame_s(recording), 5, "the recording has a frame")
+        assert abs(self.clock.now_s() - last_frame_s(recording)) < 5, f"{recording} has another time"
+        assert all(path.exists() for path in kept), "a step of the clock deleted footage"
 
     def fill_disk(self):
         with contextlib.suppress(OSError), open(self.disk / "filler", "wb") as filler:
@@ -208,15 +237,18 @@ class Torture:
 
 
 def run(torture, seconds):
-    actions = [torture.kill_recorder] * 12 + [torture.kill_host, torture.kill_web_server, torture.hang_recorder, torture.lose_store]
-    actions += [torture.kill_request, torture.cut_clients] * 2
+    """For that long; 0: does everything once."""
+    actions = [torture.kill_recorder, torture.kill_request, torture.cut_clients, torture.kill_host, torture.kill_web_server,
+               torture.hang_recorder, torture.lose_store, torture.step_clock]
     if os.geteuid() == 0:
         actions += [torture.fill_disk, torture.remount_disk_read_only, torture.unplug_disk]
+    if seconds:
+        actions += [torture.kill_recorder] * 11 + [torture.kill_request, torture.cut_clients]
     before = torture.descriptors()
     deadline = time.monotonic() + seconds
-    while time.monotonic() < deadline:
+    while not torture.counts or time.monotonic() < deadline:
         for action in random.sample(actions, len(actions)):
-            if time.monotonic() > deadline:
+            if seconds and time.monotonic() > deadline:
                 break
             action()
             torture.counts[action.__name__] += 1
@@ -236,6 +268,7 @@ def segments_of(creators):
 def main():
     options = argparse.ArgumentParser(description=__doc__)
     options.add_argument("--seconds", type=float, default=600)
+    options.add_argument("--short", action="store_const", dest="seconds", const=0, help="do everything once")
     options.add_argument("--seed", type=int, default=int(time.time()))
     options.add_argument("--postgresql", action="store_true", help="keep the records there instead of in SQLite")
     chosen = options.parse_args()
@@ -245,6 +278,7 @@ def main():
         postgres = stack.enter_context(Postgres()) if chosen.postgresql else None
         store = postgres.new_database("torture") if postgres else None
         server = Installation()
+        clock = Clock(server)
         if store is not None:
             server.home.mkdir()
             (server.home / "store").write_text(store + "\n")
@@ -252,7 +286,7 @@ def main():
         server.start()
         torture = None
         try:
-            torture = Torture(server, postgres)
+            torture = Torture(server, postgres, clock)
             run(torture, chosen.seconds)
         except BaseException:
             print(f"torture: state folder kept: {server.home}", file=sys.stderr)
