@@ -143,6 +143,10 @@ class Installation:
     def discard(self):
         self._folder.cleanup()
 
+    def keep(self):
+        """Leaves the state folder where it is, also when Python ends."""
+        self._folder._finalizer.detach()
+
     # --- the server script
 
     def start(self):

@@ -289,6 +289,7 @@ def main():
             torture = Torture(server, postgres, clock)
             run(torture, chosen.seconds)
         except BaseException:
+            server.keep()
             print(f"torture: state folder kept: {server.home}", file=sys.stderr)
             raise
         finally:
