@@ -42,7 +42,7 @@ class IsolatedSource : public media::Source {
     IsolatedSource(const std::string& url, const media::SourceOptions& options, std::stop_token stop)
         : stop_(stop),
           interrupt_(std::move(stop), [this] { ::shutdown(process_.Socket(), SHUT_RDWR); }),
-          reader_([this](std::span<std::uint8_t> buffer) { Receive(buffer); }) {
+          reader_([this](std::span<std::uint8_t> buffer, std::size_t at_least) { return Receive(buffer, at_least); }) {
         SetLimit(kStartLimit);
         Send(EncodeRequest({url, options}));
         ReportLacks(reader_.ReadConfined());
@@ -81,9 +81,12 @@ class IsolatedSource : public media::Source {
         [[maybe_unused]] const ssize_t sent = ::send(process_.Socket(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
     }
 
-    void Receive(std::span<std::uint8_t> buffer) {
-        while (!buffer.empty()) {
-            const ssize_t received = ::recv(process_.Socket(), buffer.data(), buffer.size(), MSG_WAITALL);
+    std::size_t Receive(std::span<std::uint8_t> buffer, std::size_t at_least) {
+        std::size_t filled = 0;
+        while (filled < at_least) {
+            const std::size_t room = buffer.size() - filled;
+            const int flags = room == at_least - filled ? MSG_WAITALL : 0;
+            const ssize_t received = ::recv(process_.Socket(), buffer.data() + filled, room, flags);
             const int error = errno;
             if (stop_.stop_requested()) {
                 throw media::SourceError("stopped");
@@ -95,8 +98,9 @@ class IsolatedSource : public media::Source {
             if (received == 0 || (received < 0 && error != EINTR)) {
                 throw media::SourceError(process_.End());
             }
-            buffer = buffer.subspan(static_cast<std::size_t>(std::max<ssize_t>(received, 0)));
+            filled += static_cast<std::size_t>(std::max<ssize_t>(received, 0));
         }
+        return filled;
     }
 
     const std::stop_token stop_;

@@ -13,6 +13,8 @@ namespace lookhaven::camera {
 
 namespace {
 
+// Holds most messages whole, so that each takes one call to receive.
+constexpr std::size_t kUsualBytes = 65'536;
 // A frame may have waited in the socket while this process was stopped.
 constexpr std::int64_t kMaxAgeUs = 600'000'000;
 constexpr std::int64_t kMaxAheadUs = 10'000'000;
@@ -79,15 +81,25 @@ void MessageReader::CheckHead(const MessageHead& head) const {
     }
 }
 
+// Has so many unread bytes in the buffer.
+void MessageReader::Await(std::size_t bytes) {
+    if (end_ - begin_ >= bytes) {
+        return;
+    }
+    std::copy(buffer_.data() + begin_, buffer_.data() + end_, buffer_.data());
+    end_ -= std::exchange(begin_, 0);
+    buffer_.resize(std::max({buffer_.size(), bytes, kUsualBytes}));
+    end_ += input_(std::span(buffer_).subspan(end_), bytes - end_);
+}
+
 // Leaves the body in the buffer.
 MessageHead MessageReader::ReadMessage() {
+    Await(sizeof(MessageHead));
     MessageHead head;
-    input_({reinterpret_cast<std::uint8_t*>(&head), sizeof head});
+    std::memcpy(&head, buffer_.data() + begin_, sizeof head);
     CheckHead(head);
-    buffer_.resize(std::max<std::size_t>(buffer_.size(), head.body_bytes));
-    if (head.body_bytes > 0) {
-        input_({buffer_.data(), head.body_bytes});
-    }
+    Await(sizeof head + head.body_bytes);
+    begin_ += sizeof head + head.body_bytes;
     if (IsType(head, MessageType::kFailure)) {
         if (head.flags >= base::kSignalLossNames.size()) {
             Refuse("an unknown cause");
@@ -121,7 +133,7 @@ std::optional<media::StreamFormat> MessageReader::ReadFormat(const MessageHead& 
     if (head.body_bytes < sizeof format) {
         Refuse("a format that is cut off");
     }
-    std::memcpy(&format, buffer_.data(), sizeof format);
+    std::memcpy(&format, Body(head).data(), sizeof format);
     if (!IsUsable(format, static_cast<media::Medium>(head.medium))) {
         Refuse("an unusable format");
     }

@@ -20,8 +20,9 @@ namespace lookhaven::camera {
 
 class MessageReader {
   public:
-    // Fills the whole buffer, or throws.
-    using Input = std::function<void(std::span<std::uint8_t>)>;
+    // Fills the beginning of the buffer with at least so many bytes, and with more where they have come; returns how
+    // many. Or throws.
+    using Input = std::function<std::size_t(std::span<std::uint8_t> buffer, std::size_t at_least)>;
 
     explicit MessageReader(Input input);
 
@@ -40,15 +41,21 @@ class MessageReader {
 
   private:
     MessageHead ReadMessage();
+    void Await(std::size_t bytes);
     void CheckHead(const MessageHead& head) const;
     void CountPictureFormat();
     std::optional<media::StreamFormat> ReadFormat(const MessageHead& head) const;
     media::Packet ReadFrame(const MessageHead& head) const;
 
-    std::span<const std::uint8_t> Body(const MessageHead& head) const { return {buffer_.data(), head.body_bytes}; }
+    // Of the last message.
+    std::span<const std::uint8_t> Body(const MessageHead& head) const {
+        return {buffer_.data() + begin_ - head.body_bytes, head.body_bytes};
+    }
 
     Input input_;
-    std::vector<std::uint8_t> buffer_;  // begins with the body of the last message
+    std::vector<std::uint8_t> buffer_;
+    std::size_t begin_ = 0;  // of what was received and not read …
+    std::size_t end_ = 0;    // … and its end
     std::optional<media::StreamFormat> video_;
     std::int64_t formats_paid_until_us_ = 0;  // each format of the picture moves it on by its interval
     std::optional<media::StreamFormat> audio_;

@@ -69,7 +69,10 @@ void CheckPacket(const media::Packet& packet) {
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     Process process(fuzz::Input(data, size));
-    camera::MessageReader reader([&](std::span<std::uint8_t> buffer) { process.Fill(buffer); });
+    camera::MessageReader reader([&](std::span<std::uint8_t> buffer, std::size_t at_least) {
+        process.Fill(buffer.first(at_least));
+        return at_least;
+    });
     try {
         reader.ReadConfined();
         reader.ReadOpened();

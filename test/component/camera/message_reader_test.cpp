@@ -41,15 +41,18 @@ std::string Audio(Codec codec, int rate, int channels) {
     return Message(kFormat, Bytes(FormatBody{static_cast<int>(codec), 0, 0, rate, channels}), Medium::kAudio);
 }
 
-// The frames that arrive, in order, and then how it ends: "end", or the refusal.
-std::string Read(std::string bytes) {
+// The frames that arrive, in order, and then how it ends: "end", or the refusal. At once: they have all come before the
+// first is read, else just the bytes that are waited for.
+std::string Read(std::string bytes, bool at_once) {
     std::string seen;
-    MessageReader reader([&](std::span<std::uint8_t> buffer) {
-        if (bytes.size() < buffer.size()) {
+    MessageReader reader([&](std::span<std::uint8_t> buffer, std::size_t at_least) {
+        if (bytes.size() < at_least) {
             throw std::out_of_range("end");
         }
-        std::memcpy(buffer.data(), bytes.data(), buffer.size());
-        bytes.erase(0, buffer.size());
+        const std::size_t size = at_once ? std::min(bytes.size(), buffer.size()) : at_least;
+        std::memcpy(buffer.data(), bytes.data(), size);
+        bytes.erase(0, size);
+        return size;
     });
     try {
         reader.ReadConfined();
@@ -72,6 +75,7 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
     const std::string video = opened + Video(Codec::kH264, 640, 480, "sps");
     const std::string sound = confined + Audio(Codec::kAac, 48'000, 2) + Message(kOpened);
     const std::string refused = "its process sent ";
+    const std::string long_frame(150'000, 'x');
     std::string flapping = opened;
     for (int width = 100; width < 109; ++width) {
         flapping += Video(Codec::kMjpeg, width, 100);
@@ -83,6 +87,8 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
     } rows[] = {
         {"picture", video + Message(kFrame, "one") + Video(Codec::kH264, 320, 240) + Message(kFrame, "two"),
          "one!H264640sps two!H264320 end"},
+        {"longer than what is received at once", video + Message(kFrame, long_frame) + Message(kFrame, "two"),
+         long_frame + "!H264640sps two!H264640sps end"},
         {"sound", sound + Message(kFrame, "a", Medium::kAudio), "a!AAC0 end"},
         {"its own reason", confined + Message(kFailure, "cannot open:\n\x1B[2J\xC2\x9B"), "cannot open:??[2J??"},
         {"cut off in a head", video.substr(0, video.size() - 30), "end"},
@@ -126,7 +132,8 @@ TEST(MessageReader, GivesFramesAndRefusesEverythingThatIsMalformed) {
         {"many channels", confined + Audio(Codec::kAac, 8000, 9), refused + "an unusable format"},
     };
     for (const auto& row : rows) {
-        EXPECT_EQ(Read(row.bytes), row.expected) << row.name;
+        EXPECT_EQ(Read(row.bytes, false), row.expected) << row.name;
+        EXPECT_EQ(Read(row.bytes, true), row.expected) << row.name << ", at once";
     }
 }
 
