@@ -26,7 +26,9 @@ void FrameQueue::Push(const media::Packet& packet, const std::optional<media::St
     frames_.push_back(
         {format_, packet.medium, {packet.data.begin(), packet.data.end()}, packet.timestamp_us, packet.key_frame});
     queued_bytes_ += packet.data.size();
-    changed_.notify_one();
+    if (is_video) {  // sound, which comes twice as often, waits for the next picture
+        changed_.notify_one();
+    }
 }
 
 // The frames of one format share it.

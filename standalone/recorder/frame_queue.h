@@ -42,7 +42,8 @@ class FrameQueue {
     // waits for the recording thread.
     void Push(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
 
-    // The oldest frame. Waits for one until until_us (base::MonotonicMicros) or Wake; nothing when none came.
+    // The oldest frame. Where there is none it waits for a picture until until_us (base::MonotonicMicros) or Wake;
+    // nothing when none came. Sound alone does not end the wait.
     std::optional<Frame> Pop(std::int64_t until_us);
     // Ends the Pop that is waiting; when none is, the next one does not wait.
     void Wake();
