@@ -47,6 +47,7 @@ namespace {
 
 // The sound that this process reads beside its picture; without a position until the module begins to read it.
 ring::SecondReader g_sound;
+bool g_is_silent = false;  // none will ever come
 
 constexpr std::int64_t kMaxAttachMicros = 5'000'000;
 constexpr long kAttachPollNanos = 10'000'000;
@@ -136,7 +137,8 @@ ShmStreamFifo* LiveAdoStreamFifoAt(int camId, int streamNo) {
         }
         const ring::StreamId id{camId, streamNo, base::Medium::kAudio};
         void* sound = context.MayHear() ? ring::Attach(context.Installation(), id) : nullptr;
-        g_sound = {sound != nullptr ? sound : ring::AttachEmpty(id, {}), nullptr};
+        g_is_silent = sound == nullptr;
+        g_sound = {g_is_silent ? ring::AttachEmpty(id, {}) : sound, nullptr};
         return g_sound.ring;
     });
     return static_cast<ShmStreamFifo*>(stream);
@@ -162,9 +164,12 @@ DataEntry* ShmStreamFifo::ReadLatest(int lastSeq, __tag_DATA_ENTRY_INFO* positio
 
 DataEntry* ShmStreamFifo::ReadNext(int lastSeq, __tag_DATA_ENTRY_INFO* position) {
     EndReaderOfRetired(this);
-    const bool is_video = ring::MediumOf(this) == base::Medium::kVideo;
-    return Held(is_video ? binding::ReadNextPicture(this, lastSeq, Inner(position), g_sound)
-                         : binding::ReadNextSound(this, lastSeq, Inner(position)));
+    if (ring::MediumOf(this) != base::Medium::kVideo) {
+        return Held(binding::ReadNextSound(this, lastSeq, Inner(position)));
+    }
+    const ring::SecondReader sound = g_is_silent ? ring::SecondReader{} : g_sound;
+    return Held(
+        binding::ReadNextPicture(this, lastSeq, Inner(position), g_sound.position != nullptr ? &sound : nullptr));
 }
 
 DataEntry* ShmStreamFifo::ReadLatestIFrame() {
@@ -185,6 +190,7 @@ void ShmStreamFifo::StopRead(__tag_DATA_ENTRY_INFO* position) {
     ring::StopRead(this, Inner(position));
     if (this == g_sound.ring) {
         g_sound = {};
+        g_is_silent = false;
     }
 }
 

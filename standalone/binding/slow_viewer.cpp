@@ -83,6 +83,9 @@ const ring::Entry* ReadLatestPicture(void* stream, int last_sequence, ring::Posi
 }
 
 const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position* position) {
+    if (position != nullptr && !ring::HasUnread(stream, *position)) {
+        return nullptr;
+    }
     if (!IsDrained() && base::MonotonicMicros() - g_lag.sound_us < kMaxSoundPauseUs) {
         g_lag.is_sound_held_back = true;
         return nullptr;
@@ -100,13 +103,13 @@ const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position
 }
 
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
-                                   const ring::SecondReader& sound) {
+                                   const ring::SecondReader* sound) {
     if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverdueTurn())) {
         g_lag.is_held_back = true;
         return nullptr;
     }
-    const ring::Entry* entry = sound.position != nullptr ? ring::ReadNext(stream, last_sequence, position, sound)
-                                                         : ring::ReadNext(stream, last_sequence, position);
+    const ring::Entry* entry = sound != nullptr ? ring::ReadNext(stream, last_sequence, position, *sound)
+                                                : ring::ReadNext(stream, last_sequence, position);
     while (entry != nullptr && IsSkipped(*entry)) {
         last_sequence = entry->sequence;
         ring::ReadFinish(stream, entry, position);

@@ -13,9 +13,10 @@ namespace lookhaven::binding {
 const ring::Entry* ReadLatestPicture(void* stream, int last_sequence, ring::Position* position);
 
 // As ring::ReadNext with the sound, for a stream whose pictures build on each other: null while what was sent before is
-// still on its way; where that has made the stream late it goes on at the first key frame that is not.
+// still on its way; where that has made the stream late it goes on at the first key frame that is not. sound: null for a
+// stream that does not wait.
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
-                                   const ring::SecondReader& sound);
+                                   const ring::SecondReader* sound);
 
 // As ring::ReadNext for that stream's sound, which would fill the connection that the pictures wait for. It waits too,
 // and goes on with the newest where that made it late.

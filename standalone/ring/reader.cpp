@@ -139,9 +139,14 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position) {
     return read.PinCurrent(head.newest_key);  // of an audio ring the newest entry
 }
 
+bool HasUnread(const void* ring, const Position& position) {
+    const SegmentHead& head = View(ring).Head();
+    return head.newest.load() != position.count && head.newest_key.load() != 0;
+}
+
 const Entry* ReadNext(void* ring, int last_sequence, Position* position, const SecondReader& other, int wait_millis) {
     const SegmentHead& head = View(ring).Head();
-    const SegmentHead& other_head = View(other.ring).Head();
+    const SegmentHead& other_head = other.ring == nullptr ? head : View(other.ring).Head();
     const std::int64_t deadline = Deadline(wait_millis);
     for (;;) {
         const base::SeenWord wake{head.wake, head.wake.load()};
@@ -149,10 +154,14 @@ const Entry* ReadNext(void* ring, int last_sequence, Position* position, const S
         if (const Entry* entry = ReadNext(ring, last_sequence, position)) {
             return entry;
         }
-        const bool has_other = other_head.newest.load() != other.position->count && other_head.newest_key.load() != 0;
-        const std::int64_t left = deadline - base::MonotonicMicros();
-        if (has_other || left <= 0 || head.retired.load() != 0 || other_head.retired.load() != 0 ||
-            !base::SleepWhileBoth(wake, other_wake, std::chrono::microseconds(left))) {
+        const std::chrono::microseconds left(deadline - base::MonotonicMicros());
+        if ((other.ring != nullptr && HasUnread(other.ring, *other.position)) || left.count() <= 0 ||
+            head.retired.load() != 0 || other_head.retired.load() != 0) {
+            return nullptr;
+        }
+        const bool is_undisturbed = other.ring == nullptr ? base::SleepWhile(head.wake, wake.seen, left)
+                                                          : base::SleepWhileBoth(wake, other_wake, left);
+        if (!is_undisturbed) {
             return nullptr;
         }
     }

@@ -56,7 +56,9 @@ const Entry* ReadLatest(void* ring, int last_sequence, Position* position, int w
 // The entry after last_sequence, or null when that is the newest. When last_sequence is no longer in the ring: the
 // newest key frame, or the newest entry of an audio ring. Never waits.
 const Entry* ReadNext(void* ring, int last_sequence, Position* position);
-// A stream's other ring and how far the caller has read it; both are borrowed.
+// Whether ReadNext would return an entry after the one that the position read last.
+bool HasUnread(const void* ring, const Position& position);
+// A stream's other ring and how far the caller has read it; both are borrowed. Null where the stream has only one.
 struct SecondReader {
     void* ring = nullptr;
     const Position* position = nullptr;

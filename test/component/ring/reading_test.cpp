@@ -193,7 +193,7 @@ TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
     Open(kVideo, kMjpeg, kSmall);
     OpenSound();
     ASSERT_TRUE(Write());
-    enum Read { kLatest, kNext, kNextBesideUnreadSound };
+    enum Read { kLatest, kNext, kNextOfSilent, kNextBesideUnreadSound };
     struct Row {
         const char* name;
         Read read;
@@ -206,6 +206,7 @@ TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
     for (const Row& row :
          {Row{"time", kLatest, 60, 60, 1}, Row{"longest time", kLatest, 120'000, 100, 1},
           Row{"no wait", kLatest, 0, 0, 0}, Row{"of both rings", kNext, 60, 60, 1},
+          Row{"of a silent stream", kNextOfSilent, 60, 60, 1},
           Row{"of both rings, longest time", kNext, 120'000, 100, 1}, Row{"no wait of both rings", kNext, 0, 0, 0},
           Row{"sound goes first", kNextBesideUnreadSound, 120'000, 0, 0}}) {
         SCOPED_TRACE(row.name);
@@ -215,8 +216,9 @@ TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
         if (row.read == kNextBesideUnreadSound) {
             WriteSound();
         }
+        const SecondReader sound = row.read == kNextOfSilent ? SecondReader{} : sound_;
         EXPECT_EQ(row.read == kLatest ? ReadLatest(ring_, 0, &position_, row.wait_ms)
-                                      : ReadNext(ring_, 0, &position_, sound_, row.wait_ms),
+                                      : ReadNext(ring_, 0, &position_, sound, row.wait_ms),
                   nullptr);
         const std::int64_t took_ms = (base::MonotonicMicros() - begin) / 1000;
         rusage after{};
@@ -242,6 +244,7 @@ TEST_F(ReadingTest, AFrameASoundAndASignalEndAWait) {
         const bool by_frame = round % 2 == 0;
         const bool of_both = round % 4 >= 2;
         const bool by_sound = by_frame && of_both && round % 8 >= 4;
+        const SecondReader sound = round % 16 / 2 == 1 ? SecondReader{} : sound_;
         const int last = static_cast<int>(written_) - 1;
         std::atomic<pid_t> thread{0};
         std::atomic<bool> is_done{false};
@@ -250,7 +253,7 @@ TEST_F(ReadingTest, AFrameASoundAndASignalEndAWait) {
             thread = ::gettid();
             const Entry* entry = nullptr;
             do {
-                entry = of_both ? ReadNext(ring_, last, &position_, sound_) : ReadLatest(ring_, last, &position_);
+                entry = of_both ? ReadNext(ring_, last, &position_, sound) : ReadLatest(ring_, last, &position_);
                 if (by_sound && entry == nullptr) {
                     entry =
                         ReadNext(sound_.ring,
