@@ -253,6 +253,11 @@ std::int64_t RecordingReader::TimeOf(int index) const {
     return frames_[static_cast<std::size_t>(std::max(index, 0))].time_ms;
 }
 
+std::int64_t RecordingReader::CapturedMs(int index) const {
+    const RecordedFrame& frame = At(index);
+    return Header(frame.segment).start_wall_ms + Entries(frame.segment)[frame.entry].time_ms;
+}
+
 const IndexHeader& RecordingReader::Header(std::uint32_t segment) const {
     return segments_.at(segment)->Header();
 }

@@ -100,7 +100,9 @@ std::size_t JpegExtractor::Recording::Read(int index, std::span<std::uint8_t> bu
 }
 
 JpegExtractor::JpegExtractor() = default;
-JpegExtractor::~JpegExtractor() = default;
+JpegExtractor::~JpegExtractor() {
+    RequestContext::Current().SetLastRecorded({});
+}
 
 int JpegExtractor::Init(const std::string& path) {
     return OrFailure("JpegExtractor::Init", -1, [&] {
@@ -129,6 +131,7 @@ int JpegExtractor::ReadFrame(int index, unsigned char* buffer, int& length) {
             return -1;
         }
         length = static_cast<int>(size);
+        RequestContext::Current().SetLastRecorded({buffer, m_pRecording->frames.CapturedMs(m_pRecording->last_index)});
         return 0;
     });
 }

@@ -33,17 +33,24 @@ void AppendResponseHead(std::string& head, const std::string& boundary) {
     head.append("\r\nCache-Control: no-store\r\nX-Accel-Buffering: no\r\n\r\n--").append(boundary).append("\r\n");
 }
 
-// Capture time and age when the data lies in the ring entry that is being read, else nothing.
-void AppendLiveLines(std::string& head, const void* data, const lookhaven::ring::Entry* entry) {
-    const auto* byte = static_cast<const unsigned char*>(data);
-    if (entry == nullptr || byte < entry->Data() || byte > entry->Data() + entry->length) {
-        return;
-    }
-    const std::int64_t captured = entry->CaptureMillis();
-    AppendNumber(head.append("X-Capture-Time: "), captured / 1000);
-    AppendNumber(head.append("."), captured % 1000, 3);
-    AppendNumber(head.append("\r\nX-Age-Ms: "), lookhaven::base::WallMillis() - captured);
+void AppendCaptureTime(std::string& head, std::int64_t captured_ms) {
+    AppendNumber(head.append("X-Capture-Time: "), captured_ms / 1000);
+    AppendNumber(head.append("."), captured_ms % 1000, 3);
     head.append("\r\n");
+}
+
+// Capture time and age when the data lies in the ring entry that is being read; the capture time when it is the recorded
+// picture that was read last; else nothing.
+void AppendPictureLines(std::string& head, const void* data, const RequestContext& context) {
+    const lookhaven::ring::Entry* entry = context.HeldEntry();
+    const auto* byte = static_cast<const unsigned char*>(data);
+    if (entry != nullptr && byte >= entry->Data() && byte <= entry->Data() + entry->length) {
+        AppendCaptureTime(head, entry->CaptureMillis());
+        AppendNumber(head.append("X-Age-Ms: "), lookhaven::base::WallMillis() - entry->CaptureMillis());
+        head.append("\r\n");
+    } else if (data != nullptr && data == context.LastRecorded().data) {
+        AppendCaptureTime(head, context.LastRecorded().captured_ms);
+    }
 }
 
 std::string Base64(const unsigned char* data, int length) {
@@ -73,7 +80,7 @@ int MultipartResponse::Write(const char* contentType, const void* data, int leng
         AppendResponseHead(head, output->Boundary());
     }
     AppendNumber(head.append("Content-Type: ").append(contentType).append("\r\nContent-Length: "), length);
-    AppendLiveLines(head.append("\r\n"), data, context.HeldEntry());
+    AppendPictureLines(head.append("\r\n"), data, context);
     head.append(extra == nullptr ? "" : extra).append("\r\n");
     static std::string tail;
     tail.assign("\r\n--").append(output->Boundary()).append("\r\n");

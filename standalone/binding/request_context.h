@@ -52,6 +52,12 @@ struct Restrictions {
     void AddTo(std::set<int>& denied, store::CameraAccess kind) const;
 };
 
+// A picture of a recording in the buffer of whoever asked for it.
+struct RecordedPicture {
+    const void* data = nullptr;
+    std::int64_t captured_ms = 0;  // wall clock
+};
+
 // What the store told about the caller and the mounts. A search asks for the same once for each of its cameras.
 struct RecordCache {
     std::optional<std::optional<store::User>> caller;
@@ -130,6 +136,10 @@ class LH_PLATFORM_API RequestContext {
     const ring::Entry* HeldEntry() const { return held_entry_; }
     void SetHeldEntry(const ring::Entry* entry) { held_entry_ = entry; }
 
+    // The recorded picture that was read last, as long as its recording is open; no data when there is none.
+    const RecordedPicture& LastRecorded() const { return last_recorded_; }
+    void SetLastRecorded(RecordedPicture picture) { last_recorded_ = picture; }
+
   private:
     std::optional<base::Installation> installation_;
     Output* output_ = nullptr;
@@ -147,6 +157,7 @@ class LH_PLATFORM_API RequestContext {
     bool is_hidden_ = false;
     bool has_store_failed_ = false;
     const ring::Entry* held_entry_ = nullptr;
+    RecordedPicture last_recorded_;
 };
 
 // Writes "name: what" to the log, and notes a failure of the store.

@@ -146,11 +146,18 @@ TEST(RecordingReader, JoinsTheRecordingsOfASpan) {
         Span span;
         std::vector<std::int64_t> times;
         std::vector<std::uint32_t> segments;
+        std::vector<std::int64_t> captured_ms;
     };
     const Row rows[] = {
-        {{10'400, 12'500, {names[0], names[1]}}, {100, 600, 1100, 1600}, {0, 0, 0, 1}},
-        {{10'400, 12'500, {names[0], names[1], names[2]}}, {100, 600, 1100, 1600, 1601, 2101}, {0, 0, 0, 1, 2, 2}},
-        {{12'000, 12'001, {"1970-01-01/000005-9.mkv", names[1]}}, {0}, {0}},  // one of them is gone
+        {{10'400, 12'500, {names[0], names[1]}},
+         {100, 600, 1100, 1600},
+         {0, 0, 0, 1},
+         {10'500, 11'000, 11'500, 12'000}},
+        {{10'400, 12'500, {names[0], names[1], names[2]}},
+         {100, 600, 1100, 1600, 1601, 2101},
+         {0, 0, 0, 1, 2, 2},
+         {10'500, 11'000, 11'500, 12'000, 11'000, 11'500}},
+        {{12'000, 12'001, {"1970-01-01/000005-9.mkv", names[1]}}, {0}, {0}, {12'000}},  // one of them is gone
     };
     std::filesystem::create_directories(folder / "1970-01-02");
     const std::filesystem::path path = folder / "1970-01-02/000000-4.span";
@@ -161,6 +168,7 @@ TEST(RecordingReader, JoinsTheRecordingsOfASpan) {
         EXPECT_EQ(Times(recording), row.times);
         for (int i = 0; i < recording.FrameCount(); ++i) {
             EXPECT_EQ(recording.At(i).segment, row.segments[static_cast<std::size_t>(i)]);
+            EXPECT_EQ(recording.CapturedMs(i), row.captured_ms[static_cast<std::size_t>(i)]);
         }
     }
     WriteSpan(path, {1000, 2000, {"1970-01-01/000005-9.mkv"}});

@@ -128,6 +128,22 @@ TEST_F(OutputTest, KeepsTheOrderOfStdioAndParts) {
     EXPECT_EQ(answer.find("HTTP/"), answer.npos);
 }
 
+TEST_F(OutputTest, TellsWhenARecordedPictureWasCaptured) {
+    Open();
+    StartReading(0us);
+    MultipartResponse response;
+    const char number[] = "7";
+    const char picture[] = "xyz";
+    RequestContext::Current().SetLastRecorded({picture, 1'772'366'400'045});
+    response.Write("text/plain", number, 1, nullptr);
+    response.Write("image/jpeg", picture, 3, nullptr);
+    RequestContext::Current().SetLastRecorded({});
+    response.Write("image/jpeg", picture, 3, nullptr);
+    const std::string answer = FinishReading();
+    EXPECT_NE(answer.find("Content-Length: 3\r\nX-Capture-Time: 1772366400.045\r\n\r\nxyz"), answer.npos);
+    EXPECT_EQ(answer.find("X-Capture-Time"), answer.rfind("X-Capture-Time")) << "of nothing else";
+}
+
 TEST_F(OutputTest, DescribesAMuxedStreamInEveryPart) {
     Open();
     StartReading(0us);

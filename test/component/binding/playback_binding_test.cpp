@@ -89,6 +89,7 @@ TEST_F(FootageBinding, ReadsPicturesByNumberAndTime) {
     for (const int index : {0, 7, 29, 3}) {
         EXPECT_EQ(Picture(extractor, index), "picture " + std::to_string(index));
         EXPECT_EQ(extractor.GetFrameIdx(extractor.GetTimeMS(index)), index);
+        EXPECT_EQ(RequestContext::Current().LastRecorded().captured_ms, kNoon * 1000 + index * 100);
     }
     for (const int index : {-1, 30, 1'000'000, 2'147'483'647, -2'147'483'647 - 1}) {
         EXPECT_LT(MillisOf([&] { EXPECT_EQ(Picture(extractor, index), "none") << index; }), 1000);
