@@ -8,6 +8,7 @@
 #include "standalone/store/connection.h"
 #include "standalone/store/event_row.h"
 #include "standalone/store/events.h"
+#include "standalone/store/step_text.h"
 
 namespace lookhaven::store {
 
@@ -32,9 +33,27 @@ std::string EachCameraText(const std::string& condition, const std::string& orde
            condition + ") as found order by camera_id, " + order;
 }
 
-// The filter's rows, camera by camera. Either engine looks each camera up by itself: that way it uses the index
-// (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera;
+// The rows that meet the condition, camera by camera. Either engine looks each camera up by itself: that way it uses the
+// index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera;
 // PostgreSQL, to which a question is a message and an answer, once.
+template <typename... Parameter>
+void EachCamera(Connection& connection, soci::session& sql, const std::set<int>& camera_ids,
+                const std::string& condition, const std::string& order, const Events::Visitor& visit,
+                const Parameter&... parameters) {
+    if (!connection.IsSqlite()) {
+        const std::string cameras = ArrayText(camera_ids);
+        Query<Event>(sql, kOnce, EachCameraText(condition, order), cameras, parameters...).ForEach(visit);
+        return;
+    }
+    int camera = 0;
+    Query<Event> rows(sql, kRepeatedly, "where camera_id = :camera" + condition, camera, parameters...);
+    for (const int id : camera_ids) {
+        camera = id;
+        rows.ForEach(visit);
+    }
+}
+
+// The filter's rows, camera by camera.
 void Search(Connection& connection, soci::session& sql, const EventFilter& filter, std::int64_t limit,
             const Events::Visitor& visit) {
     // Nothing starts before this and still reaches the span.
@@ -44,20 +63,16 @@ void Search(Connection& connection, soci::session& sql, const EventFilter& filte
         " and start_s >= :earliest and start_s < :end and end_s > :begin and :mount in (0, mount_id)"
         " and :reason in (0, reason) and (:finished = 0 or recording = 0) order by " +
         order + " limit :limit";
-    if (!connection.IsSqlite()) {
-        const std::string cameras = ArrayText(filter.camera_ids);
-        Query<Event>(sql, kOnce, EachCameraText(condition, order), cameras, earliest, filter.end_s, filter.begin_s,
-                     filter.mount_id, filter.reason, filter.finished_only, limit)
-            .ForEach(visit);
-        return;
-    }
-    int camera = 0;
-    Query<Event> rows(sql, kRepeatedly, "where camera_id = :camera" + condition, camera, earliest, filter.end_s,
-                      filter.begin_s, filter.mount_id, filter.reason, filter.finished_only, limit);
-    for (const int id : filter.camera_ids) {
-        camera = id;
-        rows.ForEach(visit);
-    }
+    EachCamera(connection, sql, filter.camera_ids, condition, order, visit, earliest, filter.end_s, filter.begin_s,
+               filter.mount_id, filter.reason, filter.finished_only, limit);
+}
+
+// With the reason in it as a number: that of kOthers is the condition of an index.
+std::string ReasonText(Reasons reasons) {
+    const std::string continuous = std::to_string(base::kReasonContinuous);
+    return reasons == Reasons::kAny          ? ""
+           : reasons == Reasons::kContinuous ? " and reason = " + continuous
+                                             : " and reason <> " + continuous;
 }
 
 }  // namespace
@@ -87,6 +102,24 @@ void Events::Visit(const EventFilter& filter, const Visitor& visitor) {
     connection_.Read([&](soci::session& sql) {
         Search(connection_, sql, filter, std::numeric_limits<std::int64_t>::max(), visitor);
     });
+}
+
+std::optional<Event> Events::Next(const Step& step, Reasons reasons) {
+    const std::string order = OrderText(step);
+    const std::string condition =
+        BehindText(step) + " and demo = 0" + ReasonText(reasons) + " order by " + order + " limit 1";
+    std::optional<Event> next;
+    connection_.Read([&](soci::session& sql) {
+        EachCamera(
+            connection_, sql, step.camera_ids, condition, order,
+            [&](const Event& event) {
+                if (!next || step.IsNearer(event, *next)) {
+                    next = event;
+                }
+            },
+            step.start_s, step.start_s, step.id);
+    });
+    return next;
 }
 
 std::vector<Event> Events::Open() {

@@ -17,6 +17,7 @@
 #include <set>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "standalone/store/cameras.h"
@@ -63,6 +64,25 @@ struct EventFilter {
     int offset = 0;
     int limit = std::numeric_limits<int>::max();
 };
+
+// A step along what can be played, in the order of start and id, which events and marks share. The place it starts from
+// need be no event's.
+struct Step {
+    std::set<int> camera_ids;
+    std::int64_t start_s = 0;
+    int id = 0;
+    bool backwards = false;
+
+    // Whether it comes to one, an event or a mark, before it comes to the other.
+    bool IsNearer(const auto& one, const auto& other) const {
+        const std::pair first(one.start_s, one.id);
+        const std::pair second(other.start_s, other.id);
+        return backwards ? first > second : first < second;
+    }
+};
+
+// Which reasons of recording a step stops at.
+enum class Reasons { kAny, kContinuous, kOthers };
 
 // What a mount holds, without demo events.
 struct MountContent {
@@ -114,6 +134,9 @@ class Events {
     // The same rows without offset and limit, camera by camera, as they come from the store: nothing is collected. The
     // event is borrowed for the call, and the visitor must not use this store.
     void Visit(const EventFilter& filter, const Visitor& visitor);
+
+    // The first behind the place, or the last before it. Takes the time of a few look-ups, whatever lies between.
+    std::optional<Event> Next(const Step& step, Reasons reasons);
 
     // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();

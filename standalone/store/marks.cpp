@@ -7,6 +7,7 @@
 
 #include "standalone/store/connection.h"
 #include "standalone/store/recording_plans.h"
+#include "standalone/store/step_text.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
@@ -164,6 +165,23 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
     marks.resize(std::min(marks.size(), offset + limit));
     marks.erase(marks.begin(), marks.begin() + static_cast<std::ptrdiff_t>(std::min(marks.size(), offset)));
     return marks;
+}
+
+std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) {
+    const std::string text = "where camera_id = :camera" + BehindText(step) +
+                             " and state = 1 and demo = 0 and :kind in (0, kind) order by " + OrderText(step) +
+                             " limit 1";
+    std::optional<Mark> next;
+    connection_.Read([&](soci::session& sql) {
+        for (const int camera : step.camera_ids) {
+            auto mark = FetchOne<Mark>(sql, text, camera, step.start_s, step.start_s, step.id,
+                                       kind ? static_cast<int>(*kind) : 0);
+            if (mark && (!next || step.IsNearer(*mark, *next))) {
+                next = std::move(mark);
+            }
+        }
+    });
+    return next;
 }
 
 std::vector<Mark> Marks::Pending() {

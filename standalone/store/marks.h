@@ -15,6 +15,7 @@
 #include <string>
 #include <vector>
 
+#include "standalone/store/events.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::store {
@@ -102,6 +103,8 @@ class Marks {
     std::optional<Mark> Find(MarkKind kind, int id);
     // By start and id.
     std::vector<Mark> List(const MarkFilter& filter);
+    // As Events::Next, among saved marks; of one kind, or of both.
+    std::optional<Mark> Next(const Step& step, std::optional<MarkKind> kind);
     // What the recorder has to save, by the end of the span. Costs nothing when there is none.
     std::vector<Mark> Pending();
     // Marks of the camera whose footage ended at or before that time, by start and id, without demo and pending ones:

@@ -163,6 +163,11 @@ constexpr const char* kPendingReports[] = {
 // Their secrets carry no tag.
 constexpr const char* kTaggedSessions[] = {"delete from sessions"};
 
+// Alarms are few among continuous recordings, and are looked for by themselves.
+constexpr const char* kAlarms[] = {
+    "create index events_by_alarm on events (camera_id, start_s) where reason <> 1",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -173,6 +178,7 @@ constexpr Migration kMigrations[] = {
     {"the order of recordings that got a new id", kRenumberedRecordings},
     {"reports whose footage is still to come", kPendingReports},
     {"sessions whose secret carries a tag", kTaggedSessions},
+    {"alarms among continuous recordings", kAlarms},
 };
 
 }  // namespace

@@ -86,6 +86,26 @@ class EventTest : public StoreTest {
         return filter;
     }
 
+    Step RandomStep(std::int64_t first_s) {
+        Step step{RandomSpan<EventFilter>(first_s).camera_ids};
+        step.start_s = first_s + Draw(-1, 41) * 600;
+        step.id = Draw(0, 400);
+        step.backwards = Draw(0, 1) == 0;
+        return step;
+    }
+    // What a look at every record gives.
+    template <typename Record, typename Passes>
+    static std::optional<Record> NaiveNext(const std::vector<Record>& records, const Step& step, Passes passes) {
+        std::optional<Record> next;
+        for (const Record& record : records) {
+            if (step.camera_ids.contains(record.camera_id) && !record.demo && passes(record) &&
+                step.IsNearer(step, record) && (!next || step.IsNearer(record, *next))) {
+                next = record;
+            }
+        }
+        return next;
+    }
+
     std::mt19937 random_{19528};
     Events events_{store_};
     Marks marks_{store_};
@@ -117,6 +137,18 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         found += static_cast<int>(expected.size());
     }
     EXPECT_GT(found, 1000) << "the filters let something through";
+    found = 0;
+    for (int i = 0; i < 300; ++i) {
+        const Step step = RandomStep(kDay);
+        const auto reasons = static_cast<Reasons>(Draw(0, 2));
+        const auto expected = NaiveNext(all, step, [&](const Event& event) {
+            return reasons == Reasons::kAny ||
+                   (event.reason == base::kReasonContinuous) == (reasons == Reasons::kContinuous);
+        });
+        ASSERT_EQ(events_.Next(step, reasons), expected) << i;
+        found += expected.has_value() ? 1 : 0;
+    }
+    EXPECT_GT(found, 100);
 
     for (int mount = 0; mount <= 4; ++mount) {
         std::set<int> cameras;
@@ -275,7 +307,7 @@ TEST_P(EventTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
         mark.moment_s = mark.start_s + 5;
         mark.end_s = mark.start_s + (Draw(0, 5) == 0 ? 4200 : Draw(0, 600));
         mark.text = "receipt " + std::to_string(mark.id);
-        mark.state = MarkState::kSaved;
+        mark.state = Draw(0, 3) == 0 ? MarkState::kMissed : MarkState::kSaved;
         mark.mount_id = 1;
         return mark;
     });
@@ -287,6 +319,13 @@ TEST_P(EventTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
         const auto expected =
             Naive(all, filter, [&](const Mark& mark) { return !filter.kind || mark.kind == *filter.kind; });
         ASSERT_EQ(marks_.List(filter), expected) << i;
+        const Step step = RandomStep(kDay / 2);
+        ASSERT_EQ(marks_.Next(step, filter.kind), NaiveNext(all, step,
+                                                            [&](const Mark& mark) {
+                                                                return mark.state == MarkState::kSaved &&
+                                                                       (!filter.kind || mark.kind == *filter.kind);
+                                                            }))
+            << i;
         found += static_cast<int>(expected.size());
     }
     EXPECT_GT(found, 200);
