@@ -2,6 +2,7 @@
 #include <string>
 
 #include "standalone/media/frame_decoder.h"
+#include "standalone/media/jpeg_scaler.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/media/source.h"
 #include "standalone/media/still.h"
@@ -23,6 +24,9 @@ class Library : public DecoderLibrary {
     std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame,
                                     std::size_t max_bytes) const override {
         return JpegOfKeyFrame(VideoCodecNamed(codec), frame, max_bytes);
+    }
+    std::vector<std::uint8_t> Shrink(std::span<const std::uint8_t> jpeg, int width) const override {
+        return ShrinkJpeg(jpeg, width);
     }
     std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const override {
         return OpenFrameDecoder(VideoCodecNamed(codec), threads);

@@ -82,8 +82,8 @@ class AvFrameDecoder : public FrameDecoder {
         return frame_->pts;
     }
 
-    std::size_t Encode(std::span<std::uint8_t> jpeg) override {
-        const std::span<const std::uint8_t> picture = encoder_.Encode(*frame_);
+    std::size_t Encode(std::span<std::uint8_t> jpeg, int width) override {
+        const std::span<const std::uint8_t> picture = encoder_.Encode(*frame_, width);
         if (picture.size() > jpeg.size()) {
             throw SourceError("a picture of " + std::to_string(picture.size()) + " bytes is too large");
         }

@@ -151,11 +151,11 @@ JpegEncoder::Planes JpegEncoder::ConvertColours(const AVFrame& frame) {
     return to;
 }
 
-// For any other frame, with libswscale.
-JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame) {
-    scaler_.reset(sws_getContext(frame.width, frame.height, static_cast<AVPixelFormat>(frame.format), frame.width,
-                                 frame.height, AV_PIX_FMT_YUVJ420P, SWS_BILINEAR | SWS_ACCURATE_RND, nullptr, nullptr,
-                                 nullptr));
+// For any other frame, and for another size, with libswscale.
+JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame, int width, int height) {
+    const int scaling = width == frame.width ? SWS_BILINEAR : SWS_AREA;
+    scaler_.reset(sws_getContext(frame.width, frame.height, static_cast<AVPixelFormat>(frame.format), width, height,
+                                 AV_PIX_FMT_YUVJ420P, scaling | SWS_ACCURATE_RND, nullptr, nullptr, nullptr));
     if (scaler_ == nullptr) {
         throw SourceError("cannot convert the picture");
     }
@@ -163,7 +163,7 @@ JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame) {
     sws_setColorspaceDetails(scaler_.get(), sws_getCoefficients(frame.colorspace),
                              frame.color_range == AVCOL_RANGE_JPEG, sws_getCoefficients(SWS_CS_DEFAULT), 1, 0,
                              kUnchanged, kUnchanged);
-    const Planes to = OwnPlanes(frame.width, frame.height);
+    const Planes to = OwnPlanes(width, height);
     std::uint8_t* const rows[] = {const_cast<std::uint8_t*>(to.data[0]), const_cast<std::uint8_t*>(to.data[1]),
                                   const_cast<std::uint8_t*>(to.data[2])};
     CheckAv(sws_scale(scaler_.get(), frame.data, frame.linesize, 0, frame.height, rows, to.strides),
@@ -171,19 +171,24 @@ JpegEncoder::Planes JpegEncoder::ConvertLayout(const AVFrame& frame) {
     return to;
 }
 
-std::span<const std::uint8_t> JpegEncoder::Encode(const AVFrame& frame) {
+std::span<const std::uint8_t> JpegEncoder::Encode(const AVFrame& frame, int width) {
     const bool is_usual = frame.format == AV_PIX_FMT_YUV420P || frame.format == AV_PIX_FMT_YUVJ420P;
-    Planes planes = is_usual ? ConvertColours(frame) : ConvertLayout(frame);
+    const bool is_smaller = width > 0 && width < frame.width;
+    if (!is_smaller) {
+        width = frame.width;
+    }
+    const int height = std::max(static_cast<int>(std::lround(1.0 * frame.height * width / frame.width)), 1);
+    Planes planes = is_usual && !is_smaller ? ConvertColours(frame) : ConvertLayout(frame, width, height);
     // The compressor assumes a buffer of this size, whatever size it is told.
-    const std::size_t needed = tjBufSize(frame.width, frame.height, TJSAMP_420);
+    const std::size_t needed = tjBufSize(width, height, TJSAMP_420);
     if (needed > jpeg_bytes_) {
         jpeg_ = std::make_unique_for_overwrite<std::uint8_t[]>(needed);
         jpeg_bytes_ = needed;
     }
     unsigned char* output = jpeg_.get();
     unsigned long size = needed;
-    if (tjCompressFromYUVPlanes(compressor_.get(), planes.data, frame.width, planes.strides, frame.height, TJSAMP_420,
-                                &output, &size, kQuality, TJFLAG_NOREALLOC) != 0) {
+    if (tjCompressFromYUVPlanes(compressor_.get(), planes.data, width, planes.strides, height, TJSAMP_420, &output,
+                                &size, kQuality, TJFLAG_NOREALLOC) != 0) {
         throw SourceError(std::string("cannot encode: ") + tjGetErrorStr2(compressor_.get()));
     }
     return {jpeg_.get(), size};

@@ -23,8 +23,9 @@ class JpegEncoder {
     JpegEncoder();
     ~JpegEncoder();
 
-    // The picture of the frame, valid until the next call. Throws SourceError.
-    std::span<const std::uint8_t> Encode(const AVFrame& frame);
+    // The picture of the frame, valid until the next call. width: made that wide, at the frame's proportions; 0, or not
+    // less than the frame's: as it is. Throws SourceError.
+    std::span<const std::uint8_t> Encode(const AVFrame& frame, int width = 0);
 
   private:
     struct Planes {
@@ -37,7 +38,7 @@ class JpegEncoder {
 
     Planes OwnPlanes(int width, int height);
     Planes ConvertColours(const AVFrame& frame);
-    Planes ConvertLayout(const AVFrame& frame);
+    Planes ConvertLayout(const AVFrame& frame, int width, int height);
 
     std::unique_ptr<void, int (*)(void*)> compressor_;
     std::unique_ptr<SwsContext, FreeScaler> scaler_;

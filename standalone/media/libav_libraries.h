@@ -33,8 +33,9 @@ class FrameDecoder {
     virtual void Feed(std::span<const std::uint8_t> frame, std::int64_t number) = 0;
     // The number of the next picture in presentation order; nothing when more frames must be fed first.
     virtual std::optional<std::int64_t> Take() = 0;
-    // Encodes the picture last taken into the buffer and returns its size. Throws SourceError when it does not fit.
-    virtual std::size_t Encode(std::span<std::uint8_t> jpeg) = 0;
+    // Encodes the picture last taken into the buffer and returns its size. width: made that wide, unless it is 0 or the
+    // picture is no wider. Throws SourceError when it does not fit.
+    virtual std::size_t Encode(std::span<std::uint8_t> jpeg, int width) = 0;
 };
 
 class DecoderLibrary {
@@ -46,6 +47,8 @@ class DecoderLibrary {
     // As JpegOfKeyFrame in still.h.
     virtual std::vector<std::uint8_t> Still(std::string_view codec, std::span<const std::uint8_t> frame,
                                             std::size_t max_bytes) const = 0;
+    // As ShrinkJpeg in jpeg_scaler.h.
+    virtual std::vector<std::uint8_t> Shrink(std::span<const std::uint8_t> jpeg, int width) const = 0;
     // Each thread beyond the first delays pictures by one more frame, so use one thread at the end of a growing
     // recording. Throws SourceError for a codec that cannot be decoded.
     virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const = 0;

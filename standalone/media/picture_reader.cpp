@@ -35,7 +35,7 @@ std::size_t PictureReader::Read(int index, std::span<std::uint8_t> buffer) {
         Seek(frame.segment, frame.entry);
         Decode(frame.entry);
     }
-    return decoder_->Encode(buffer);
+    return decoder_->Encode(buffer, 0);
 }
 
 std::size_t PictureReader::ReadSmaller(std::uint32_t segment, const archive::FrameEntry& entry,

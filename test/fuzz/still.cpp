@@ -4,6 +4,7 @@
 #include "standalone/media/still.h"
 
 #include "standalone/media/jpeg.h"
+#include "standalone/media/jpeg_scaler.h"
 #include "standalone/media/source.h"
 #include "test/fuzz/fuzz.h"
 
@@ -14,6 +15,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     fuzz::Input input(data, size);
     const media::Codec codec = kCodecs[input.Take<std::uint8_t>() % std::size(kCodecs)];
     try {
+        if (codec == media::Codec::kMjpeg) {
+            fuzz::Require(media::JpegSize(media::ShrinkJpeg(input.Rest(), 320)).has_value());
+        }
         fuzz::Require(media::JpegSize(media::JpegOfKeyFrame(codec, input.Rest())).has_value());
     } catch (const media::SourceError&) {
     }

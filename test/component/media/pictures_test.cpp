@@ -5,6 +5,7 @@
 #include <fstream>
 #include <numeric>
 #include <random>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -120,6 +121,45 @@ TEST(PictureReader, MakesPicturesOfMotionJpegThatDoNotFitSmaller) {
         ASSERT_TRUE(size) << divisor;
         EXPECT_EQ(JpegSize(whole)->width % size->width, 0) << divisor;
         EXPECT_EQ(size->width == JpegSize(whole)->width, divisor == 1) << divisor;
+    }
+}
+
+// Each in a list of events: what ffmpeg makes of the whole picture at that size.
+TEST(SmallPictures, LookLikeTheWholeOnes) {
+    for (const auto& [options, width, size] :
+         {std::tuple(kMjpeg, 40, "40:30"), {kMjpeg, 50, "60:45"}, {kMjpeg, 1, "20:15"}, {kH264, 50, "50:38"}}) {
+        SCOPED_TRACE(std::string(options) + size);
+        const ArchiveFolder folder;
+        Record(MakeClip(options), folder / "a.mkv");
+        const archive::RecordingReader recording(folder / "a.mkv");
+        PictureReader reader(recording);
+        std::ofstream whole(folder / "whole.jpg", std::ios::binary);
+        const Picture picture = Read(reader, 0);
+        whole.write(reinterpret_cast<const char*>(picture.data()), std::ssize(picture));
+        whole.close();
+        Picture shrunk;
+        if (options == kMjpeg) {
+            shrunk = LoadDecoderLibrary().Shrink(picture, width);
+        } else {
+            const auto decoder = LoadDecoderLibrary().OpenDecoder("H264", 1);
+            const archive::FrameEntry& entry = recording.Entries(0)[0];
+            Picture frame(entry.size);
+            recording.ReadBytes(0, entry, frame);
+            decoder->Feed(frame, 0);
+            decoder->Feed({}, 0);
+            ASSERT_EQ(decoder->Take(), 0);
+            shrunk.resize(1 << 20);
+            shrunk.resize(decoder->Encode(shrunk, width));
+        }
+        std::ofstream(folder / "small.jpg", std::ios::binary)
+            .write(reinterpret_cast<const char*>(shrunk.data()), std::ssize(shrunk));
+        const std::string psnr = Shell("cd " + folder.Path().string() +
+                                       " && ffmpeg -v info -i whole.jpg -i small.jpg -lavfi '[0:v]scale=" + size +
+                                       ":flags=area,format=rgb24[a];[1:v]format=rgb24[b];[a][b]psnr' -f null - 2>&1 |"
+                                       " grep -o 'average:[0-9.inf]*'");
+        ASSERT_THAT(psnr, testing::StartsWith("average:")) << "of another size";
+        EXPECT_GT(std::stod(psnr.substr(8)), 25) << psnr;
+        EXPECT_THROW(LoadDecoderLibrary().Shrink(Picture{1, 2, 3}, width), SourceError);
     }
 }
 
