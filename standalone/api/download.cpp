@@ -4,52 +4,36 @@
 #include <algorithm>
 #include <cctype>
 #include <cstdio>
-#include <filesystem>
 #include <string>
 #include <system_error>
 
 #include <unistd.h>
 
 #include "standalone/api/decoder_sandbox.h"
-#include "standalone/archive/recording_reader.h"
+#include "standalone/api/footage.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/base/text.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/store/cameras.h"
-#include "standalone/store/events.h"
-#include "standalone/store/mounts.h"
 
 namespace lookhaven::api {
 
 namespace {
 
-struct Footage {
-    int camera_id = 0;
-    int mount_id = 0;
-    std::int64_t start_s = 0;
-    std::string path;  // relative to the mount
-};
+constexpr std::int64_t kMaxOffsetMinutes = 24 * 60;
 
-std::optional<Footage> Find(store::Store& records, std::optional<store::MarkKind> kind, int id) {
-    if (kind) {
-        const auto mark = store::Marks(records).Find(*kind, id);
-        const bool saved = mark && mark->state == store::MarkState::kSaved && !mark->demo;
-        return saved ? std::optional(Footage{mark->camera_id, mark->mount_id, mark->start_s, mark->path})
-                     : std::nullopt;
+// "Entrance 2026-03-01 08.15.30Z", or in the client's zone "Entrance 2026-03-01 09.15.30".
+std::string TitleOf(const Call& call, const Footage& footage) {
+    const std::int64_t offset_min = call.NumberOr("utc_offset_min", 0);
+    if (offset_min < -kMaxOffsetMinutes || offset_min > kMaxOffsetMinutes) {
+        throw Failure(400, "utc_offset_min is out of its bounds");
     }
-    const auto event = store::Events(records).Find(id);
-    return event && !event->demo
-               ? std::optional(Footage{event->camera_id, event->mount_id, event->start_s, event->path})
-               : std::nullopt;
-}
-
-// "Entrance 2026-03-01 08.15.30Z"
-std::string TitleOf(store::Store& records, const Footage& footage) {
-    const auto camera = store::Cameras(records).Find(footage.camera_id);
-    std::string time = base::FormatUtc(footage.start_s * 1000);  // 2026-03-01T08:15:30.000Z
-    time = time.substr(0, 10) + ' ' + time.substr(11, 2) + '.' + time.substr(14, 2) + '.' + time.substr(17, 2) + 'Z';
+    const auto camera = store::Cameras(call.Records()).Find(footage.camera_id);
+    std::string time = base::FormatUtc((footage.start_s + offset_min * 60) * 1000);  // 2026-03-01T08:15:30.000Z
+    time = time.substr(0, 10) + ' ' + time.substr(11, 2) + '.' + time.substr(14, 2) + '.' + time.substr(17, 2) +
+           (call.Parameter("utc_offset_min").isNull() ? "Z" : "");
     return (camera ? camera->name : "Camera " + std::to_string(footage.camera_id)) + ' ' + time;
 }
 
@@ -65,44 +49,34 @@ std::string Disposition(const std::string& title) {
 
 }  // namespace
 
-void Download(const Call& call, std::optional<store::MarkKind> kind, int event) {
-    store::Store& records = call.Records();
-    const auto footage = Find(records, kind, event);
-    const auto mount = footage ? store::Mounts(records).Find(footage->mount_id) : std::nullopt;
-    const auto path = mount ? std::filesystem::path(mount->path) / footage->path : std::filesystem::path();
-    if (!mount || !binding::MayUse(footage->camera_id, store::CameraAccess::kPlayback) ||
-        !std::filesystem::exists(path)) {
-        throw Failure(404, "there is no such event, or no footage of it");
-    }
+std::string Download(const Call& call) {
+    const Footage footage = RequireFootage(call);
     media::ExportOptions options;
-    options.with_sound = binding::MayUse(footage->camera_id, store::CameraAccess::kAudio);
+    options.with_sound = binding::MayUse(footage.camera_id, store::CameraAccess::kAudio);
     const std::string head = "Status: 200 OK\r\nContent-Type: video/x-matroska\r\nCache-Control: no-store\r\n"
                              "Content-Disposition: " +
-                             Disposition(TitleOf(records, *footage)) + "\r\nContent-Length: ";
+                             Disposition(TitleOf(call, footage)) + "\r\nContent-Length: ";
     // Announced, so that a copy that fails midway is seen to be cut.
     options.announce = [&head](std::int64_t size_bytes) {
         const std::string whole = head + std::to_string(size_bytes) + "\r\n\r\n";
         std::fwrite(whole.data(), 1, whole.size(), stdout);
         std::fflush(stdout);
     };
-    call.context.CloseRecords();
     call.context.NoteStream();
-    // Checked while an error answer is still possible.
-    if (archive::RecordingReader(path).FrameCount() == 0) {
-        throw Failure(404, "nothing of the event is recorded yet");
-    }
+    OpenFootage(call, footage, 0);  // while an error answer is still possible
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     call.slots.KeepOnly(call.slot);
     const base::Installation& installation = call.context.Installation();
     // The copier reads what a camera has sent.
     EnterPlaybackSandbox(installation, PlaybackFilter(installation.StoreUrl()));
     try {
-        remux.Copy(path, STDOUT_FILENO, options);
+        remux.Copy(footage.path, STDOUT_FILENO, options);
     } catch (const std::system_error& error) {
         if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
             throw;
         }  // else the client has gone, which is no failure
     }
+    return "";
 }
 
 }  // namespace lookhaven::api

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Event: report what happened at a camera, list it, download its footage.
+// VEXO.Event: report what happened at a camera, list it, walk through it, download its footage.
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
@@ -9,6 +9,7 @@
 #include "platform/camera/camgroup.h"
 #include "platform/recording/eventsearch.h"
 #include "standalone/api/download.h"
+#include "standalone/api/footage.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
@@ -25,17 +26,6 @@ constexpr std::int64_t kMaxAheadSeconds = 300;  // a POS terminal's clock may be
 constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
 constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
-
-std::optional<store::MarkKind> KindOf(const Call& call) {
-    const Json::Value kind = call.Parameter("kind");
-    if (kind.isNull()) {
-        return std::nullopt;
-    }
-    if (kind == "alert" || kind == "pos") {
-        return kind == "alert" ? store::MarkKind::kAlert : store::MarkKind::kPos;
-    }
-    throw Failure(400, "kind must be alert or pos");
-}
 
 // One text, or a list of lines.
 std::string TextOf(const Json::Value& text) {
@@ -192,13 +182,76 @@ std::string List(const Call& call) {
     return SuccessAnswer(data);
 }
 
-std::string DownloadIt(const Call& call) {
-    Download(call, KindOf(call), call.Parameter("event").asInt());
-    return "";
+// What the parameter "kinds" names, as a list; all when it is missing.
+struct Kinds {
+    bool continuous = true;
+    bool alarm = true;
+    bool alert = true;
+    bool pos = true;
+
+    explicit Kinds(const Json::Value& asked) {
+        if (asked.isNull()) {
+            return;
+        }
+        continuous = alarm = alert = pos = false;
+        const std::string text = asked.asString();
+        for (std::size_t at = 0; at < text.size();) {
+            const std::size_t end = std::min(text.find(',', at), text.size());
+            Choose(text.substr(at, end - at));
+            at = end + 1;
+        }
+    }
+
+    void Choose(const std::string& name) {
+        bool* const kind = name == "continuous" ? &continuous
+                           : name == "alarm"    ? &alarm
+                           : name == "alert"    ? &alert
+                           : name == "pos"      ? &pos
+                                                : nullptr;
+        if (kind == nullptr) {
+            throw Failure(400, "kinds must be of continuous, alarm, alert and pos");
+        }
+        *kind = true;
+    }
+
+    store::Reasons Reasons() const {
+        return continuous && alarm ? store::Reasons::kAny
+               : continuous        ? store::Reasons::kContinuous
+                                   : store::Reasons::kOthers;
+    }
+    std::optional<store::MarkKind> OnlyMark() const {
+        return alert && pos ? std::nullopt : std::optional(alert ? store::MarkKind::kAlert : store::MarkKind::kPos);
+    }
+};
+
+std::string Next(const Call& call) {
+    const Kinds kinds(call.Parameter("kinds"));
+    const Json::Value& before = call.Parameter("before");
+    store::Step step{.camera_ids = CamerasOf(call)};
+    step.start_s = call.NumberOr("time", base::WallSeconds());
+    step.backwards = !before.isNull() && before.asBool();
+    step.id = call.Parameter("event").isNull() ? (step.backwards ? 0 : std::numeric_limits<int>::max())
+                                               : call.Parameter("event").asInt();
+    const auto event =
+        kinds.continuous || kinds.alarm ? store::Events(call.Records()).Next(step, kinds.Reasons()) : std::nullopt;
+    const auto mark =
+        kinds.alert || kinds.pos ? store::Marks(call.Records()).Next(step, kinds.OnlyMark()) : std::nullopt;
+    Json::Value data;
+    data["event"] = Json::nullValue;
+    if (event && (!mark || step.IsNearer(*event, *mark))) {
+        data["event"] = Describe(*event);
+    } else if (mark) {
+        data["event"] = Describe(*mark);
+    }
+    return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {
-    {"Mark", MarkIt, Method::Effect::kChanges}, {"List", List}, {"Get", Get}, {"Download", DownloadIt}};
+constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Effect::kChanges},
+                               {"List", List},
+                               {"Get", Get},
+                               {"Next", Next},
+                               {"Frame", TellFrame},
+                               {"Download", Download}};
 
 }  // namespace
 

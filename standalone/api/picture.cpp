@@ -1,29 +1,36 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Picture: one JPEG of a camera, whatever codec it sends.
+// VEXO.Picture: one JPEG of a camera, live or recorded, whatever codec it sends.
 //
 // Why so        A snapshot exists for Motion JPEG only; a browser that cannot decode a camera's video should still show
 //               something. The frame is copied out of the ring before it is decoded, so that the writer need not skip
-//               it.
+//               it. Of a recording one key frame is read and decoded, so that a list of events may show a picture each.
 #include "standalone/api/own_apis.h"
 
 #include <array>
 #include <cstdio>
 #include <optional>
+#include <span>
 #include <stdexcept>
+#include <string>
 #include <vector>
 
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
 #include "standalone/api/decoder_sandbox.h"
+#include "standalone/api/footage.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
+#include "standalone/store/cameras.h"
 
 namespace lookhaven::api {
 
 namespace {
+
+constexpr int kUsualWidth = 320;
+constexpr int kMinWidth = 16;
 
 struct KeyFrame {
     std::string codec;
@@ -50,29 +57,40 @@ std::optional<KeyFrame> NewestKeyFrame(int camera, int stream) {
     return frame;
 }
 
-std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
-    if (frame.codec == "MJPEG") {
-        return std::move(frame.data);
-    }
+// Decodes a camera's bytes, confined. Throws Failure with that status where they cannot be decoded.
+template <typename Decode>
+std::vector<std::uint8_t> Confined(const Call& call, int failure_status, Decode&& decode) {
     try {
         const media::DecoderLibrary& decoder = media::LoadDecoderLibrary();
         call.context.CloseRecords();
         EnterStillPictureSandbox(call.slots, call.slot);
-        return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
+        return decode(decoder);
     } catch (const std::runtime_error& problem) {
         base::LogError(std::string("no picture of a key frame: ") + problem.what());
-        throw Failure(504, "the camera's picture cannot be decoded");
+        throw Failure(failure_status, "the camera's picture cannot be decoded");
     }
 }
 
-std::string ImageAnswer(const std::vector<std::uint8_t>& jpeg, std::int64_t capture_millis) {
-    std::array<char, 200> head{};
-    std::snprintf(head.data(), head.size(),
-                  "Status: 200 OK\r\nContent-Type: image/jpeg\r\nCache-Control: no-store\r\nContent-Length: %zu\r\n"
-                  "X-Capture-Time: %lld.%03d\r\n\r\n",
-                  jpeg.size(), static_cast<long long>(capture_millis / 1000), static_cast<int>(capture_millis % 1000));
-    return std::string(head.data()).append(reinterpret_cast<const char*>(jpeg.data()), jpeg.size());
+std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
+    if (frame.codec == "MJPEG") {
+        return std::move(frame.data);
+    }
+    return Confined(call, 504, [&frame](const media::DecoderLibrary& decoder) {
+        return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
+    });
 }
+
+// cache: header lines that say who may keep the answer, and for how long.
+std::string ImageAnswer(const std::vector<std::uint8_t>& jpeg, std::int64_t capture_millis, const std::string& cache) {
+    std::array<char, 160> head{};
+    std::snprintf(head.data(), head.size(),
+                  "Status: 200 OK\r\nContent-Type: image/jpeg\r\nContent-Length: %zu\r\nX-Capture-Time: %lld.%03d\r\n",
+                  jpeg.size(), static_cast<long long>(capture_millis / 1000), static_cast<int>(capture_millis % 1000));
+    std::string answer = head.data() + cache + "\r\n";
+    return answer.append(reinterpret_cast<const char*>(jpeg.data()), jpeg.size());
+}
+
+constexpr const char* kKeepNot = "Cache-Control: no-store\r\n";
 
 std::string Get(const Call& call) {
     const int id = call.Parameter("camera").asInt();
@@ -91,10 +109,108 @@ std::string Get(const Call& call) {
         throw Failure(504, "no picture came");
     }
     const std::int64_t captured = frame->capture_millis;
-    return ImageAnswer(Jpeg(call, *std::move(frame)), captured);
+    return ImageAnswer(Jpeg(call, *std::move(frame)), captured, kKeepNot);
 }
 
-constexpr Method kMethods[] = {{"Get", Get}};
+// The footage that was asked for: of an event, or of what the camera recorded last at or before the time.
+Footage FootageOf(const Call& call) {
+    if (!call.Parameter("event").isNull()) {
+        return RequireFootage(call);
+    }
+    const int camera = call.Parameter("camera").asInt();
+    if (camera <= 0 || call.Parameter("time_ms").isNull()) {
+        throw Failure(400, "needs an event, or a camera and time_ms");
+    }
+    if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
+        throw Failure(404, kNoSuchCamera);
+    }
+    const store::Step back{{camera}, call.NumberOr("time_ms", 0) / 1000 + 1, 0, true};
+    const auto event = store::Events(call.Records()).Next(back, store::Reasons::kAny);
+    if (!event) {
+        throw Failure(404, "nothing was recorded at or before that time");
+    }
+    return RequireFootage(call, *event);
+}
+
+int FrameOf(const Call& call, const archive::RecordingReader& recording) {
+    if (call.Parameter("frame").isNull()) {
+        return FrameAt(recording, call.NumberOr("time_ms", 0));
+    }
+    const int frame = call.Parameter("frame").asInt();
+    if (frame < 0 || frame >= recording.FrameCount()) {
+        throw Failure(404, "the event has no such frame");
+    }
+    return frame;
+}
+
+struct RecordedKeyFrame : KeyFrame {
+    int width = 0;
+    bool is_final = false;  // whenever it is asked for again, the answer is the same
+};
+
+RecordedKeyFrame KeyFrameOf(const Call& call) {
+    const std::int64_t time_ms = call.NumberOr("time_ms", 0);
+    const Footage footage = FootageOf(call);
+    const archive::RecordingReader recording = OpenFootage(call, footage, time_ms);
+    const archive::RecordedFrame& shown = recording.At(FrameOf(call, recording));
+    const std::span<const archive::FrameEntry> entries = recording.Entries(shown.segment);
+    std::uint32_t key = shown.entry;
+    while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[shown.entry].time_ms)) {
+        --key;
+    }
+    const archive::IndexHeader& header = recording.Header(shown.segment);
+    RecordedKeyFrame frame;
+    frame.codec = header.codec;
+    frame.width = header.width;
+    frame.capture_millis = header.start_wall_ms + entries[key].time_ms;
+    // What a camera records later may be nearer to a time behind the event.
+    frame.is_final =
+        !footage.grows && !recording.Grows() && (!call.Parameter("event").isNull() || time_ms < footage.end_s * 1000);
+    frame.data.resize(entries[key].size);
+    recording.ReadBytes(shown.segment, entries[key], frame.data);
+    return frame;
+}
+
+std::vector<std::uint8_t> SmallJpeg(const Call& call, RecordedKeyFrame frame, int width) {
+    if (frame.codec == "MJPEG" && frame.width <= width) {
+        return std::move(frame.data);
+    }
+    return Confined(call, 404, [&](const media::DecoderLibrary& library) {
+        if (frame.codec == "MJPEG") {
+            return library.Shrink(frame.data, width);
+        }
+        const auto decoder = library.OpenDecoder(frame.codec, 1);
+        decoder->Feed(frame.data, 0);
+        decoder->Feed({}, 0);
+        if (!decoder->Take()) {
+            throw std::runtime_error("no picture comes out of it");
+        }
+        std::vector<std::uint8_t> jpeg(base::kMaxFrameBytes);
+        jpeg.resize(decoder->Encode(jpeg, width));
+        return jpeg;
+    });
+}
+
+std::string At(const Call& call) {
+    const std::int64_t width = call.NumberOr("width", kUsualWidth);
+    if (width < kMinWidth || width > base::kMaxSidePixels) {
+        throw Failure(400, "width is out of its bounds");
+    }
+    RecordedKeyFrame frame = KeyFrameOf(call);
+    std::string cache = kKeepNot;
+    if (frame.is_final) {
+        // By the cookie, so that nobody gets what another account has looked at in the same browser.
+        const std::string tag = '"' + std::to_string(frame.capture_millis) + '-' + std::to_string(width) + '"';
+        cache = "Cache-Control: private, max-age=31536000, immutable\r\nVary: Cookie\r\nETag: " + tag + "\r\n";
+        if (call.request.Header("HTTP_IF_NONE_MATCH") == tag) {
+            return "Status: 304 Not Modified\r\n" + cache + "\r\n";
+        }
+    }
+    const std::int64_t captured = frame.capture_millis;
+    return ImageAnswer(SmallJpeg(call, std::move(frame), static_cast<int>(width)), captured, cache);
+}
+
+constexpr Method kMethods[] = {{"Get", Get}, {"At", At}};
 
 }  // namespace
 

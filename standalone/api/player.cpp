@@ -16,6 +16,7 @@ namespace {
 constexpr const char* kPlayerApi = "VEXO.Lookhaven.Player";
 constexpr const char* kByFrames = "PlayMjpegEvent";
 constexpr const char* kByTimes = "PlayMjpegEventNoFrameId";
+constexpr int kUsualSideBySide = 4;
 constexpr int kMaxSideBySide = 16;
 
 int IntOr(const Call& call, const char* name, int fallback) {
@@ -30,7 +31,7 @@ bool IsPlayer(const Call& call) {
 }
 
 int PlayersPerSession(store::Store& records) {
-    return std::clamp(store::Settings(records).NumberOr("players_per_session", 1), 1, kMaxSideBySide);
+    return std::clamp(store::Settings(records).NumberOr("players_per_session", kUsualSideBySide), 1, kMaxSideBySide);
 }
 
 void PreparePlayer(const Call& call) {

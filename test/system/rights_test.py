@@ -36,9 +36,13 @@ POST Event.Mark kind=alert camera={camera}                            E      E  
 Event.List cameralists={camera}: event                                E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Event.Next cameralists={camera} time=-1d: event                       E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Event.Frame event={event} time_ms=0                                   E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Download event={event}                                          E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Pairing.Cameras                                                       E      E     E       E     E    E       E        E      E       D
 Picture.Get camera={camera}                                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Picture.At camera={camera} time_ms=now_ms                              E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+Picture.At event={alert} kind=alert frame=0                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 POST Playback.SetRate timestamp=1 rate=2                              E      E     N       N     N    N       N        N      N       E
 Playback.GetPosition timestamp=1                                      E      E     N       N     N    N       N        N      N       E
 POST Playback.Pause timestamp=1 on=true                               E      E     N       N     N    N       N        N      N       E
@@ -74,6 +78,7 @@ TELLS = {
     ("Emaps", "map"): lambda data: any(one["id"] == 1 for one in data["emap"]),
     ("States", "door"): lambda data: any(one["id"] == 2 for one in data["door"]),
     ("States", "camera"): lambda data: any(one["camera"] == 2 for one in data["io"]),
+    ("Next", "event"): lambda data: data["event"] is not None and data["event"]["camera_id"] == 2,
     ("List", "event"): lambda data: any(event["camera_id"] == 2 for event in data["event"]),
     ("LoadCamera", "camera"): lambda data: any(one["id"] == 2 for one in data["camera"]),
     ("SearchAvaiDate", "day"): lambda data: 1 in data["available_day"],
@@ -124,7 +129,7 @@ class RightsTest(unittest.TestCase):
     def ask(self, is_post, request, told, caller, **objects):
         """The outcome's letter, and all of the answer that must not tell a hidden object from an absent one."""
         now = int(time.time())
-        words = {"-1d": now - 86400, "now": now}
+        words = {"-1d": now - 86400, "now": now, "now_ms": now * 1000}
         given = dict(word.format(**objects).split("=") for word in request.split()[1:])
         given = {name: words.get(value, value) for name, value in given.items()}
         api, method = api_and_method(request)

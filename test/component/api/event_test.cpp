@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // VEXO.Event and VEXO.Catalog: what can be marked, listed and found, by whom, and what bad input gets.
+#include <cmath>
 #include <fstream>
 #include <set>
 
@@ -129,6 +130,14 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=List&cameralists=" + many, "", 400},
         {"Event&version=1&method=List&kind=all", "", 400},
         {"Event&version=1&method=List&from=now", "", 400},
+        {"Event&version=1&method=Next&kinds=alert,fire", "", 400},
+        {"Event&version=1&method=Next&time=now", "", 400},
+        {"Event&version=1&method=Frame&event=99", "", 404},
+        {"Picture&version=1&method=At", "", 400},
+        {"Picture&version=1&method=At&camera=1", "", 400},
+        {"Picture&version=1&method=At&camera=1&time_ms=5", "", 404},
+        {"Picture&version=1&method=At&event=99", "", 404},
+        {"Picture&version=1&method=At&event=99&width=9", "", 400},
         {"Event&version=1&method=Download", "", 404},
         {"Event&version=1&method=Download&event=99", "", 404},
         {"Event&version=1&method=Download&event=x", "", 400},
@@ -170,6 +179,91 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
     EXPECT_EQ(Ask(download).status, 404) << "an empty file";
     std::filesystem::remove(footage_.FileOf(event));
     EXPECT_EQ(Ask(download).status, 404) << "a file that is gone";
+}
+
+TEST_F(EventApi, WalksThroughWhatCanBePlayed) {
+    const std::int64_t noon = 1'772'366'400;
+    const int first = footage_.Record(1, noon, 30);
+    const int hidden = footage_.Record(2, noon + 60, 10);
+    const int last = footage_.Record(1, noon + 20'000'000, 10);  // months later
+    const int alert = footage_.Mark(1, 1, noon + 20, 5, "door", first);
+    store::Marks(footage_.Records()).Add(store::MarkKind::kPos, 1, noon + 21, 5, "has no footage yet");
+    const auto at = [](std::int64_t time, int event) {
+        return "&time=" + std::to_string(time) + (event == 0 ? "" : "&event=" + std::to_string(event));
+    };
+    const struct {
+        std::string query;
+        int next;
+        int next_of_viewer;
+    } rows[] = {
+        {at(noon, first), alert, alert},
+        {at(noon + 60, 0), last, last},
+        {at(noon + 59, 0), hidden, last},
+        {at(noon, first) + "&kinds=continuous", hidden, last},
+        {at(noon, first) + "&kinds=alarm,pos", 0, 0},
+        {at(noon, first) + "&kinds=continuous,alarm&cameralists=2", hidden, 0},
+        {at(noon + 20'000'000, last), 0, 0},
+        {at(noon + 20'000'000, last) + "&before=true", hidden, alert},
+        {at(noon + 20'000'000, last) + "&before=true&kinds=alert,alarm", alert, alert},
+        {at(noon, first) + "&before=true", 0, 0},
+        {"&kinds=continuous&before=true", last, last},
+    };
+    for (const auto& row : rows) {
+        for (const bool as_viewer : {false, true}) {
+            const Json::Value next = Ask("Event&version=1&method=Next" + row.query, "", as_viewer).Json()["data"];
+            EXPECT_EQ(next["event"].isNull() ? 0 : next["event"]["id"].asInt(),
+                      as_viewer ? row.next_of_viewer : row.next)
+                << row.query;
+        }
+    }
+}
+
+TEST_F(EventApi, FindsAFrameByItsTimeAndGivesItsPicture) {
+    const std::int64_t noon = 1'772'366'400;
+    const std::string event = "event=" + std::to_string(footage_.Record(1, noon, 30));
+    const std::string alert =
+        "kind=alert&event=" + std::to_string(footage_.Mark(1, 1, noon + 20, 5, "door", std::stoi(event.substr(6))));
+    store::Event open = store::Events(footage_.Records()).Find(std::stoi(event.substr(6))).value();
+    open.id = store::Events(footage_.Records()).NextId();
+    open.recording = true;
+    open.start_s += 1000;
+    open.end_s += 1000;
+    store::Events(footage_.Records()).Begin(open);
+    const std::string growing = "event=" + std::to_string(open.id);
+    const struct {
+        std::string query;
+        std::int64_t time_ms;  // since noon
+        int frame;             // of the footage
+        int picture;           // of the recording
+        bool is_kept;
+    } rows[] = {
+        {event, 1234, 12, 12, true},      {event, -5, 0, 0, true},
+        {event, 99'000, 299, 299, true},  {alert, 20'550, 5, 205, true},
+        {alert, 0, 0, 200, true},         {growing, 1100, 11, 11, false},
+        {"camera=1", 1299, 12, 12, true}, {"camera=1", 40'000, 299, 299, false},
+    };
+    for (const auto& row : rows) {
+        const std::string asked = row.query + "&time_ms=" + std::to_string(noon * 1000 + row.time_ms);
+        SCOPED_TRACE(asked);
+        if (row.query != "camera=1") {
+            const Json::Value told = Ask("Event&version=1&method=Frame&" + asked).Json()["data"];
+            EXPECT_EQ(told["frame"], row.frame);
+            EXPECT_EQ(told["captured_ms"].asInt64(), noon * 1000 + row.picture * 100);
+            EXPECT_EQ(told["frame_count"], row.query == alert ? 50 : 300);
+        }
+        const Answer still = Ask("Picture&version=1&method=At&width=640&" + asked);
+        EXPECT_EQ(still.body, "picture " + std::to_string(row.picture));
+        EXPECT_EQ(std::llround(std::stod(still.headers.at("X-Capture-Time")) * 1000), noon * 1000 + row.picture * 100);
+        EXPECT_EQ(still.headers.at("Cache-Control") == "no-store", !row.is_kept);
+        if (row.is_kept) {
+            EXPECT_EQ(still.headers.at("Vary"), "Cookie");
+            const HostUnderTest::Headers known{{"HTTP_IF_NONE_MATCH", still.headers.at("ETag")}};
+            const Answer again = host_.Ask("api=VEXO.Picture&version=1&method=At&width=640&" + asked, admin_, known);
+            EXPECT_EQ(again.status, 304);
+            EXPECT_EQ(again.body, "");
+        }
+    }
+    EXPECT_EQ(Ask("Picture&version=1&method=At&width=640&frame=7&" + alert).body, "picture 207");
 }
 
 TEST_F(EventApi, TellsWhichCamerasAreDownToThoseWhoMayWatchThem) {

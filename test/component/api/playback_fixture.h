@@ -15,6 +15,7 @@
 #include <sys/socket.h>
 #include <sys/time.h>
 
+#include "standalone/store/settings.h"
 #include "test/support/host/host_under_test.h"
 
 namespace lookhaven::api {
@@ -70,9 +71,15 @@ class Player {
 
 class Playback : public testing::Test {
   protected:
+    Playback() { Allow(1); }
     // Its players tidy up behind themselves.
     ~Playback() override { host_.End(SIGTERM); }
 
+    // So many players side by side.
+    void Allow(int players) const {
+        store::Store records = store::Store::Open(host_.Home().StoreUrl());
+        store::Settings(records).Set("players_per_session", std::to_string(players));
+    }
     Player Play(const std::string& query) {
         Player player(host_, session_.secret, query);
         EXPECT_TRUE(player.Tell("rate")) << query;

@@ -51,10 +51,7 @@ TEST_F(Playback, LeavesAloneWhomNobodyHasReplaced) {
 }
 
 TEST_F(Playback, LetsAsManyPlaySideBySideAsTheSettingSays) {
-    {
-        store::Store records = store::Store::Open(host_.Home().StoreUrl());
-        store::Settings(records).Set("players_per_session", "3");
-    }
+    Allow(3);
     std::vector<Player> players;
     for (int key = 1; key <= 5; ++key) {
         players.push_back(Play("PlayMjpegEvent&timestamp=" + std::to_string(key)));

@@ -1,0 +1,95 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/footage.h"
+
+#include <algorithm>
+
+#include "standalone/binding/rights.h"
+#include "standalone/control/flush_request.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+Footage Of(const store::Event& event) {
+    return {event.id,      std::nullopt, event.camera_id, event.mount_id,
+            event.start_s, event.end_s,  event.recording, event.path};
+}
+
+std::optional<Footage> Find(store::Store& records, std::optional<store::MarkKind> kind, int id) {
+    if (kind) {
+        const auto mark = store::Marks(records).Find(*kind, id);
+        const bool is_saved = mark && mark->state == store::MarkState::kSaved && !mark->demo;
+        return is_saved ? std::optional(Footage{id, kind, mark->camera_id, mark->mount_id, mark->start_s, mark->end_s,
+                                                false, mark->path})
+                        : std::nullopt;
+    }
+    const auto event = store::Events(records).Find(id);
+    return event && !event->demo ? std::optional(Of(*event)) : std::nullopt;
+}
+
+Footage Require(const Call& call, std::optional<Footage> footage) {
+    const auto mount = footage ? store::Mounts(call.Records()).Find(footage->mount_id) : std::nullopt;
+    if (mount) {
+        footage->path = std::filesystem::path(mount->path) / footage->path;
+    }
+    if (!mount || !binding::MayUse(footage->camera_id, store::CameraAccess::kPlayback) ||
+        !std::filesystem::exists(footage->path)) {
+        throw Failure(404, "there is no such event, or no footage of it");
+    }
+    return *std::move(footage);
+}
+
+}  // namespace
+
+std::optional<store::MarkKind> KindOf(const Call& call) {
+    const Json::Value& kind = call.Parameter("kind");
+    if (kind.isNull()) {
+        return std::nullopt;
+    }
+    if (kind == "alert" || kind == "pos") {
+        return kind == "alert" ? store::MarkKind::kAlert : store::MarkKind::kPos;
+    }
+    throw Failure(400, "kind must be alert or pos");
+}
+
+Footage RequireFootage(const Call& call) {
+    const auto kind = KindOf(call);
+    return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()));
+}
+
+Footage RequireFootage(const Call& call, const store::Event& event) {
+    return Require(call, event.demo ? std::nullopt : std::optional(Of(event)));
+}
+
+archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, std::int64_t until_ms) {
+    call.context.CloseRecords();
+    // What the row tells is on the disk.
+    if (footage.grows && until_ms >= footage.end_s * 1000) {
+        control::FlushRequests(call.context.Installation()).Ask(footage.id);
+    }
+    archive::RecordingReader recording(footage.path);
+    if (recording.FrameCount() == 0) {
+        throw Failure(404, "nothing of the event is recorded yet");
+    }
+    return recording;
+}
+
+int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms) {
+    const std::int64_t since_start_ms = std::max(time_ms, recording.StartWallMs()) - recording.StartWallMs();
+    return std::clamp(recording.IndexAt(since_start_ms), 0, recording.FrameCount() - 1);
+}
+
+std::string TellFrame(const Call& call) {
+    const std::int64_t time_ms = call.NumberOr("time_ms", 0);
+    const Footage footage = RequireFootage(call);
+    const archive::RecordingReader recording = OpenFootage(call, footage, time_ms);
+    const int frame = FrameAt(recording, time_ms);
+    Json::Value data;
+    data["frame"] = frame;
+    data["frame_count"] = recording.FrameCount();
+    data["captured_ms"] = Json::Int64{recording.CapturedMs(frame)};
+    return SuccessAnswer(data);
+}
+
+}  // namespace lookhaven::api

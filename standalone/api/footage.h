@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The footage of an event that the caller may play back, and the frames in it.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <string>
+
+#include "standalone/api/call.h"
+#include "standalone/archive/recording_reader.h"
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+
+namespace lookhaven::api {
+
+struct Footage {
+    int id = 0;
+    std::optional<store::MarkKind> kind;  // nothing for a recorded event
+    int camera_id = 0;
+    int mount_id = 0;
+    std::int64_t start_s = 0;
+    std::int64_t end_s = 0;
+    bool grows = false;          // more of a recorded event may come
+    std::filesystem::path path;  // relative to the mount; once it was required, absolute
+};
+
+// The call's parameter "kind". Throws Failure 400 for what is neither "alert" nor "pos"; nothing when it is missing.
+std::optional<store::MarkKind> KindOf(const Call& call);
+
+// The call's event and kind. Throws Failure 404 when there is no such event, it has no footage, or the caller may not
+// see it.
+Footage RequireFootage(const Call& call);
+// The footage of a row that was found. As above.
+Footage RequireFootage(const Call& call, const store::Event& event);
+
+// Opens it, with all that the recorder has of it up to that time. Closes the store. Throws Failure 404 when nothing is
+// recorded yet; archive::ArchiveError, std::system_error.
+archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, std::int64_t until_ms);
+
+// The index of the last frame at or before that time, by the wall clock; the first or the last one for a time outside.
+int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms);
+
+// The method Frame of VEXO.Event.
+std::string TellFrame(const Call& call);
+
+}  // namespace lookhaven::api
