@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a jump.
-// EVENT_START and EVENT_MIDDLE are Unix seconds of a recording of camera 1.
+// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a jump;
+// marks by their addresses, and on to the event after. EVENT_START and EVENT_MIDDLE are Unix seconds of a recording of camera 1,
+// MARKS are addresses of marks within its recordings.
 import { address, folder, logIn, report, visit } from "./chromium.mjs";
 
 const start = Number(process.env.EVENT_START);
@@ -20,6 +21,7 @@ await visit(async (page, complaints) => {
       picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
       told: Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)[1]) - 1,
       time: document.querySelector(".transport-time").textContent,
+      caption: document.querySelector(".stage-time").textContent,
     }));
 
   await page.goto(`${address}#events`);
@@ -33,7 +35,7 @@ await visit(async (page, complaints) => {
     await page.mouse.click(box.x + x, y);
     await settled("playing", "empty");
     const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
-    return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time}`) / 1000;
+    return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time.slice(0, 8)}`) / 1000 + Number(time.slice(8));
   };
   // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, go on towards the
   // seconds with the wheel, and look again.
@@ -73,5 +75,25 @@ await visit(async (page, complaints) => {
   await timeAt(x + Math.min(3 / scale, box.width - x - 20));
   await page.keyboard.press(" ");
   await settled("paused");
-  await report("jumped", { ...(await shown()), complaints });
+  await report("jumped", await shown());
+
+  for (const mark of process.env.MARKS.split(",")) {
+    await page.goto(`${address}#${mark}`);
+    await page.waitForFunction(() => /^frame ([5-9]|\d\d)/.test(document.querySelector(".transport-frame").textContent));
+    await page.keyboard.press(" ");
+    await settled("paused");
+    const after = page.locator('[aria-label^="Next event: "]');
+    await report(mark.split("=")[0], { ...(await shown()), next: await after.getAttribute("aria-label", { timeout: 5000 }) });
+  }
+  await page.keyboard.press("ArrowDown");
+  await page.locator(".notice.shown").waitFor();
+  await settled("paused");
+  await page.locator(".row-still.loaded").nth(1).waitFor();
+  await page.screenshot({ path: `${folder}/walked.png` });
+  await report("walked", {
+    address: await page.evaluate(() => location.hash),
+    notice: await text(".notice"),
+    stills: await page.locator(".row-still.loaded").count(),
+    complaints,
+  });
 });

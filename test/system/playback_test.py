@@ -31,14 +31,16 @@ def steer(server, method, **form):
     return server.request(call("VEXO.Playback", method), "admin", form={"timestamp": 1, **form})
 
 
-def numbered(parts, count):
-    """Pairs of a number part and the picture after it."""
+def numbered(parts, count, times=None):
+    """Pairs of a number part and the picture after it; the capture times are added to the list."""
     pairs = []
     while len(pairs) < count:
         head, body = parts.next()
         assert head["content-type"] == "text/plain", head
         picture_head, picture = parts.next()
         assert picture_head["content-type"] == "image/jpeg", picture_head
+        if times is not None:
+            times.append(picture_head["x-capture-time"])
         pairs.append((int(body), picture))
     return pairs
 
@@ -60,6 +62,11 @@ class PlaybackTest(unittest.TestCase):
     @classmethod
     def finished(cls, camera):
         return next(event for event in recorded_events(cls.server, camera) if not event["is_recording"])
+
+    @staticmethod
+    def captured(event, number):
+        """When the picture of that painted number was taken."""
+        return f"{event['start'] + number // 25}.{number % 25 * 40:03}"
 
     def check(self, pairs, expected):
         """The numbers told are those expected, and so are those painted."""
@@ -135,23 +142,55 @@ class PlaybackTest(unittest.TestCase):
 
     def test_a_visit_finds_the_picture_of_a_time(self):
         span = {"EVENT_START": str(self.event["start"]), "EVENT_MIDDLE": str(self.event["start"] + 8)}
-        with Visit("events.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", **span) as visit:
-            def see(step):
+        marks = {kind: self.mark(kind) for kind in ("alert", "pos")}
+        links = ",".join(f"{kind}={mark['id']}" for kind, (mark, _) in marks.items())
+        with Visit("events.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", MARKS=links, **span) as visit:
+            def see(step, event=self.event, is_number_told=True):
                 seen = visit.see(step)
                 painted = self.reader.read([base64.b64decode(seen["picture"])])[0]
-                self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
-                clock = {time.strftime("%H:%M:%S", time.gmtime(self.event["start"] + painted / 25 + off)) for off in (-1, 0, 1)}
-                self.assertIn(seen["time"][-8:], clock)
+                if is_number_told:
+                    self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
+                clock = time.strftime("%H:%M:%S", time.gmtime(event["start"] + painted // 25))
+                for text in (seen["time"], seen["caption"]):
+                    self.assertEqual(text.split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
                 return seen
 
             found = see("found")
-            self.assertLess(abs(found["told"] - 8 * 25), 75, "about the time that was clicked")
+            self.assertLess(abs(found["told"] - 8 * 25), 25, "the time that was clicked, as far as the timeline can be read")
             self.assertTrue(visit.see("stands still")["same"])
             self.assertEqual(see("one on")["told"], found["told"] + 1)
             self.assertEqual(see("two back")["told"], found["told"] - 1)
-            jumped = see("jumped")
-            self.assertGreater(jumped["told"], found["told"])
-            self.assertEqual(jumped["complaints"], [])
+            self.assertGreater(see("jumped")["told"], found["told"])
+            for kind, (mark, recording) in marks.items():
+                opened = see(kind, recording, is_number_told=False)
+                self.assertGreater(opened["told"], 0)
+                place = call("VEXO.Event", "Next", cameralists="1,2,4", time=mark["start"], event=mark["id"])
+                following = self.server.request(place, "admin").json["data"]["event"]
+                self.assertIn(time.strftime("%H:%M", time.gmtime(following.get("time", following["start"]))), opened["next"])
+            walked = visit.see("walked")
+            self.assertEqual(walked["address"], f"#{following['kind']}={following['id']}")
+            self.assertIn(walked["notice"], opened["next"])
+            self.assertGreater(walked["stills"], 1)
+            self.assertEqual(walked["complaints"], [])
+
+    def mark(self, kind):
+        """One of camera 1, and the recording that it lies in."""
+        mark = self.server.request(call("VEXO.Event", "List", kind=kind, cameralists=1), "admin").json["data"]["event"][0]
+        self.assertEqual(mark["state"], "saved")
+        events = recorded_events(self.server, 1)
+        return mark, next(event for event in events if event["start"] <= mark["start"] < event["stop"])
+
+    def test_gives_a_picture_of_any_time(self):
+        for camera, event, key_frame in ((1, self.event, 77), (2, self.finished(2), 75)):
+            asked = call("VEXO.Picture", "At", camera=camera, time_ms=event["start"] * 1000 + 77 * 40)
+            whole = self.server.request({**asked, "width": 640}, "admin")
+            self.assertEqual(self.reader.read([whole.body]), [key_frame])
+            self.assertEqual(whole.headers["X-Capture-Time"], self.captured(event, key_frame))
+            self.assertIn("immutable", whole.headers["Cache-Control"])
+            known = {"If-None-Match": whole.headers["ETag"]}
+            self.assertEqual(self.server.request({**asked, "width": 640}, "admin", headers=known).status, 304)
+            small = self.server.request({**asked, "width": 160}, "admin").body
+            self.assertEqual(self.probe(small, "stream=width,height").strip(), "160,90")
 
     def test_an_older_player_gives_way(self):
         cookie, other_cookie = self.server.login("admin"), self.server.login("admin")
@@ -204,15 +243,15 @@ class PlaybackTest(unittest.TestCase):
 
     def test_plays_the_footage_of_alerts_and_sales(self):
         for kind, kind_number in (("alert", 1), ("pos", 2)):
-            query = call("VEXO.Event", "List", kind=kind, cameralists=1)
-            mark = self.server.request(query, "admin").json["data"]["event"][0]
-            self.assertEqual(mark["state"], "saved")
+            mark, recording = self.mark(kind)
+            times = []
             with playing(self.server, mark["id"], recEvtType=kind_number) as parts:
-                pairs = numbered(parts, 30)
+                pairs = numbered(parts, 30, times)
             painted = self.reader.read([picture for _, picture in pairs])
             self.assertEqual([number for number, _ in pairs], [*range(30)])
             self.assertEqual(painted, [*range(painted[0], painted[0] + 30)])
             self.assertGreater(painted[0], 0, "the footage begins inside the recording")
+            self.assertEqual(times, [self.captured(recording, number) for number in painted])
 
     def test_what_is_forbidden_or_gone_does_not_play(self):
         forbidden = self.finished(2)

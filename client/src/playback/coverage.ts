@@ -2,7 +2,7 @@
 //
 // What of a span was recorded, as segments for a timeline; and the kinds of events that the user tells apart.
 
-import type { Footage, FootageKind, Runs } from "../wire/recordings";
+import type { EventKind, Footage, Runs } from "../wire/recordings";
 
 export interface Segment {
   startS: number;
@@ -23,8 +23,7 @@ export function segmentsOf(fromS: number, toS: number, interval: number, runs: R
   return segments;
 }
 
-/** What the user filters by. */
-export type EventKind = "continuous" | "alarm" | Exclude<FootageKind, "event">;
+export type { EventKind };
 
 export const kEventKinds: readonly EventKind[] = ["continuous", "alarm", "alert", "pos"];
 

@@ -11,22 +11,23 @@ import { ServerError } from "../wire/server";
 
 export interface RecordedFrame {
   index: number;
+  /** Unix milliseconds at which the camera's picture was taken in. */
+  capturedMs: number;
   jpeg: Blob;
 }
 
-/** More than the longest time between two frames of slow motion. */
-const kMaxSilenceMs = 25_000;
-
 /**
  * Opens a stream and hands its frames to `take` until that returns false, the stream ends (both resolve) or fails
- * (rejects with a ServerError). Ends at once when `owner` is aborted.
+ * (rejects with a ServerError, of status 0 when the connection was lost or nothing came for `maxSilenceMs`). Ends at once
+ * when `owner` is aborted.
  */
 export async function readFrames(
   open: (signal: AbortSignal) => Promise<Response>,
   take: (frame: RecordedFrame) => Promise<boolean>,
   owner: AbortSignal,
+  maxSilenceMs: number,
 ): Promise<void> {
-  const deadline = new Deadline(kMaxSilenceMs, owner);
+  const deadline = new Deadline(maxSilenceMs, owner);
   try {
     const answer = await open(deadline.signal);
     const boundary = boundaryOf(answer.headers.get("Content-Type"));
@@ -41,7 +42,8 @@ export async function readFrames(
       for (const part of parts.splice(0)) {
         if (owner.aborted) return;
         if (!/^image\//.test(part.headers.get("content-type") ?? "")) index = indexOf(part, index);
-        else if (!(await take({ index, jpeg: new Blob([part.body], { type: "image/jpeg" }) }))) return;
+        else if (!(await take(frameOf(part, index)))) return;
+        deadline.extend();
       }
     }
   } catch (error) {
@@ -57,4 +59,10 @@ export async function readFrames(
 function indexOf(part: Part, before: number): number {
   const index = parseInt(new TextDecoder().decode(part.body), 10);
   return Number.isNaN(index) ? before : index;
+}
+
+function frameOf({ headers, body }: Part, index: number): RecordedFrame {
+  const capturedMs = Math.round(Number(headers.get("x-capture-time")) * 1000);
+  if (!(capturedMs > 0)) throw new MultipartError("a picture without its time");
+  return { index, capturedMs, jpeg: new Blob([body], { type: "image/jpeg" }) };
 }

@@ -6,24 +6,33 @@
 //               every seek opens another. While paused there is no connection at all. A held
 //               key or a dragged playhead asks for more frames than can be fetched: then only the last is.
 //
+//               A stream counts frames, and each carries its time; which frame a time has, only the server knows.
+//
 //               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
-//               growing recording continues as it grows, and ends with it.
+//               growing recording continues as it grows, and ends with it. Where the connection is lost, another stream goes on
+//               from the frame on the screen.
 
 import { delay } from "../wire/delay";
-import { newStreamKey, type Footage, type Recordings, type Start } from "../wire/recordings";
+import { isSameFootage, newStreamKey, type Footage, type FrameStart, type Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
-import { FrameClock } from "./frame_clock";
+import { isPassing, reasonOf } from "./failure_reason";
 import { readFrames, type RecordedFrame } from "./frame_stream";
 import type { PlayerState } from "./player_state";
+import { kMaxFrameMs, ShownFrame } from "./shown_frame";
+import { StillReader } from "./still_reader";
 
 const kTailDelayMs = 1_000;
 /** The server waits longer for what is still being recorded, and not at all when another player takes over. */
 const kTailSilenceMs = 1_500;
-/** A list rounds a recording's end to seconds. */
-const kExactUntilMs = 1_000;
-const kCannotPlay = 200;
-/** A frame is decoded from the key frame before it on, so a step back keeps this many that are passed for the next steps. */
+/** At rate 1 a frame comes at least every second; opening a stream takes longer where the server is busy. */
+const kMaxSilenceMs = 8_000;
+/** Between attempts to get a lost stream back. */
+const kRetryMs = 1_000;
+/** How many frames a step back fetches. */
 const kStepBackFrames = 12;
+
+/** Where playing begins, or what a still shows: a frame, or the frame of a time in Unix milliseconds. */
+type Start = FrameStart | { atMs: number };
 
 export class Player {
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
@@ -31,9 +40,10 @@ export class Player {
   readonly #recordings: Recordings;
   readonly #changed: () => void;
   #footage: Footage | null = null;
-  #clock = new FrameClock(0, 0);
   #state: PlayerState = { kind: "empty" };
-  #index = 0;
+  readonly #shown = new ShownFrame();
+  /** As far as is known; 0 when it is not. */
+  #frameCount = 0;
   #rate = 1;
   #key = 0;
   #lastFrameMs = 0;
@@ -43,12 +53,12 @@ export class Player {
   /** While paused: the frame requested last, until it is shown; and the request that is under way. */
   #wanted: Start | null = null;
   #fetching: AbortSignal | null = null;
-  /** What the last step back to the server has passed. */
-  readonly #kept = new Map<number, RecordedFrame>();
+  readonly #stills: StillReader;
 
   /** `changed` is called with every frame and every other change. */
   constructor(recordings: Recordings, changed: () => void) {
     this.#recordings = recordings;
+    this.#stills = new StillReader(recordings);
     this.#changed = changed;
   }
 
@@ -62,38 +72,49 @@ export class Player {
 
   /** Of the frame on the screen. */
   get index(): number {
-    return this.#index;
+    return this.#shown.index;
   }
 
   get rate(): number {
     return this.#rate;
   }
 
-  /** Unix milliseconds of the frame on the screen. */
-  get timeMs(): number {
-    return (this.#footage?.start ?? 0) * 1000 + this.#clock.msOf(this.#index);
+  /** How many frames there are; 0 when that is not known. */
+  get frameCount(): number {
+    return this.#frameCount;
   }
 
-  /** Changes to a recording, `sinceStartMs` after its start. */
-  open(footage: Footage, sinceStartMs: number, isPlaying: boolean): void {
-    const isSame = this.#footage?.kind === footage.kind && this.#footage.id === footage.id;
+  /** Unix milliseconds at which the frame on the screen was taken; before the first one, of the time that was asked for. */
+  get timeMs(): number {
+    return this.#shown.capturedMs;
+  }
+
+  /** The same, but going on while the last picture of a slow camera is repeated. */
+  get positionMs(): number {
+    return this.#shown.positionMs;
+  }
+
+  /** Changes to a recording, at that time. */
+  open(footage: Footage, atMs: number, isPlaying: boolean): void {
+    const isSame = isSameFootage(footage, this.#footage);
     if (!isSame) {
-      this.#clock = new FrameClock(footage.frameCount, durationMs(footage));
-      this.#kept.clear();
+      this.#frameCount = footage.frameCount;
+      this.#shown.reset(Math.max(atMs, footage.start * 1000));
+      this.#stills.forget();
     }
     this.#take(footage);
-    const start = this.#startAt(sinceStartMs);
+    const start = this.#startAt(atMs);
     if (isPlaying) void this.#play(start);
     else this.#showStill(start);
   }
 
   play(): void {
     if (!this.#footage || this.#state.kind === "playing") return;
-    void this.#play(this.#wanted ?? this.#opening ?? { index: this.#state.kind === "ended" ? 0 : this.#index });
+    void this.#play(this.#wanted ?? this.#opening ?? { index: this.#state.kind === "ended" ? 0 : this.index });
   }
 
   pause(): void {
-    if (this.#state.kind !== "playing" && this.#state.kind !== "opening") return;
+    if (!["playing", "opening", "lost"].includes(this.#state.kind)) return;
     // Before the first frame there is no picture yet that could stay. A still that is being fetched is as good as a pause.
     if (this.#opening) return this.#showStill(this.#opening);
     if (this.#fetching) return;
@@ -103,11 +124,11 @@ export class Player {
 
   step(by: number): void {
     if (!this.#footage) return;
-    const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.#index;
-    const last = this.#footage.isGrowing || !this.#footage.frameCount ? Infinity : this.#footage.frameCount - 1;
+    const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.index;
+    const last = this.#footage.isGrowing || this.#frameCount === 0 ? Infinity : this.#frameCount - 1;
     const index = Math.max(0, Math.min(from + by, last));
     const start: Start = by < 0 ? { index, from: Math.max(0, index - kStepBackFrames + 1) } : { index };
-    if (index !== this.#index || this.#state.kind !== "paused") this.#showStill(start);
+    if (index !== this.index || this.#state.kind !== "paused") this.#showStill(start);
   }
 
   /** Changes a running stream, without interruption where the server can do that. */
@@ -118,14 +139,14 @@ export class Player {
     if (this.#state.kind !== "playing") return;
     const run = this.#run;
     this.#recordings.setRate(this.#key, rate).catch(() => {
-      if (run === this.#run && this.#state.kind === "playing") void this.#play({ index: this.#index });
+      if (run === this.#run && this.#state.kind === "playing") void this.#play({ index: this.index });
     });
   }
 
   /** Closes the connection, and goes back to having nothing to play. */
   close(): void {
     this.#begin();
-    this.#kept.clear();
+    this.#stills.forget();
     this.#footage = null;
     this.#become({ kind: "empty" });
   }
@@ -144,15 +165,28 @@ export class Player {
 
   #take(footage: Footage): void {
     this.#footage = footage;
-    this.#clock.extend(footage.frameCount, durationMs(footage));
+    this.#frameCount = Math.max(this.#frameCount, footage.frameCount);
   }
 
-  #startAt(ms: number): Start {
-    const footage = this.#footage!;
-    const timeMs = Math.round(Math.max(0, Math.min(ms, durationMs(footage))));
-    if (timeMs === 0) return { index: 0 };
-    // The server finds times in recordings only, not in marks.
-    return footage.kind === "event" ? { timeMs } : { index: this.#clock.indexOf(timeMs) };
+  #startAt(atMs: number): Start {
+    const { start, frameCount } = this.#footage!;
+    // Of a mark nobody has told how many frames it has.
+    return atMs <= start * 1000 && frameCount > 0 ? { index: 0 } : { atMs: Math.round(atMs) };
+  }
+
+  /** The frame to begin with; null when the server does not say, which has become the state. */
+  async #locate(start: Start, signal: AbortSignal): Promise<FrameStart | null> {
+    if ("index" in start) return start;
+    try {
+      const footage = this.#footage!;
+      const { index, frameCount } = await this.#recordings.frameAt(footage, start.atMs);
+      if (signal.aborted) return null;
+      if (isSameFootage(footage, this.#footage)) this.#frameCount = frameCount;
+      return { index };
+    } catch (error) {
+      if (!signal.aborted) await this.#fail(error as ServerError, signal);
+      return null;
+    }
   }
 
   #showStill(start: Start): void {
@@ -174,52 +208,40 @@ export class Player {
   }
 
   /** Shows one frame; false when that failed, which has become the state. */
-  async #fetch(start: Start, signal: AbortSignal): Promise<boolean> {
+  async #fetch(wanted: Start, signal: AbortSignal): Promise<boolean> {
     const footage = this.#footage!;
-    const kept = "index" in start ? this.#kept.get(start.index) : undefined;
-    if (kept) {
-      await this.#showFrame(kept, signal);
-      return !signal.aborted;
-    }
-    this.#kept.clear();
-    let isShown = false;
-    const open = (until: AbortSignal) => this.#recordings.play(footage, start, "one", 1, newStreamKey(), until);
-    const take = async (frame: RecordedFrame) => {
-      if ("index" in start && start.from !== undefined) this.#kept.set(frame.index, frame);
-      if ("index" in start && frame.index < start.index) return true;
-      await this.#showFrame(frame, signal);
-      isShown = true;
-      return false;
-    };
+    const start = await this.#locate(wanted, signal);
+    if (!start) return false;
     try {
-      await readFrames(open, take, signal);
+      await this.#stills.read(footage, start, (frame) => this.#showFrame(frame, signal), signal, kMaxSilenceMs);
     } catch (error) {
       if (!signal.aborted) await this.#fail(error as ServerError, signal);
       return false;
     }
-    if (isShown && "timeMs" in start && start.timeMs < durationMs(footage) - kExactUntilMs) {
-      this.#clock.learn(this.#index, start.timeMs);
-    }
-    if (!isShown && !signal.aborted) await this.#fail(new ServerError(0, 0, "The connection was lost."), signal);
-    return isShown;
+    return true;
   }
 
   async #play(start: Start): Promise<void> {
     const signal = this.#begin();
     this.#opening = start;
-    this.#kept.clear();
+    this.#stills.forget();
     this.#become({ kind: "opening" });
-    let next = start;
-    if ("timeMs" in start) {
-      if (!(await this.#fetch(start, signal)) || signal.aborted) return;
-      next = { index: this.#index };
-    }
-    for (let index = (next as { index: number }).index; !signal.aborted; index = this.#index) {
+    const first = await this.#locate(start, signal);
+    if (!first) return;
+    this.#opening &&= first;
+    for (let index = first.index; !signal.aborted; index = this.#opening ? first.index : this.index) {
       const failure = await this.#stream(index, signal).catch((error: ServerError) => error);
-      if (signal.aborted) return;
-      if (failure) return this.#fail(failure, signal);
-      if (this.#state.kind === "ended" || !(await this.#continues(signal))) return;
+      if (signal.aborted || this.#state.kind === "ended") return;
+      // A stream that has shown a picture can be had again.
+      if (failure && (this.#opening || !isPassing(failure))) return this.#fail(failure, signal);
+      if (failure) await this.#awaitReturn(signal);
+      else if (!(await this.#continues(signal))) return;
     }
+  }
+
+  async #awaitReturn(signal: AbortSignal): Promise<void> {
+    if (this.#state.kind !== "lost") this.#become({ kind: "lost" });
+    await delay(kRetryMs, signal);
   }
 
   /** Plays from a frame on to the end of the stream. */
@@ -244,6 +266,7 @@ export class Player {
         return !signal.aborted;
       },
       signal,
+      kMaxSilenceMs + kMaxFrameMs * Math.max(0, -rate, -this.#rate),
     );
   }
 
@@ -253,7 +276,7 @@ export class Player {
     if (signal.aborted) return;
     this.#lastFrameMs = performance.now();
     this.#opening = null;
-    this.#index = frame.index;
+    this.#shown.take(frame);
     this.#changed();
   }
 
@@ -264,14 +287,18 @@ export class Player {
   async #continues(signal: AbortSignal): Promise<boolean> {
     const before = this.#footage!;
     const wasAtTail = before.isGrowing && performance.now() - this.#lastFrameMs >= kTailSilenceMs;
-    const footage = await this.#recordings.find(before).catch(() => before);
+    const footage = await this.#recordings.find(before).catch((error: ServerError) => (isPassing(error) ? "lost" : before));
     if (signal.aborted) return false;
+    if (footage === "lost") {
+      await this.#awaitReturn(signal);
+      return !signal.aborted;
+    }
     if (!footage) {
       await this.#fail(new ServerError(404, 0, ""), signal);
       return false;
     }
     this.#take(footage);
-    const isAtEnd = !footage.isGrowing && this.#index + Math.max(1, this.#rate) >= footage.frameCount;
+    const isAtEnd = !footage.isGrowing && this.index + Math.max(1, this.#rate) >= this.#frameCount;
     if (!wasAtTail || isAtEnd) {
       this.#become({ kind: wasAtTail ? "ended" : "preempted" });
       return false;
@@ -282,20 +309,10 @@ export class Player {
     return !signal.aborted;
   }
 
-  /** Tells a recording that retention has deleted from one that cannot be played. */
   async #fail(error: ServerError, signal: AbortSignal): Promise<void> {
-    let reason = error.message;
-    if (error.status === kCannotPlay || error.status === 404) {
-      const footage = await this.#recordings.find(this.#footage!).catch(() => this.#footage);
-      if (signal.aborted) return;
-      if (!footage) reason = "The recording no longer exists.";
-      else if (error.status === 404) reason = "The recording cannot be played.";
-    }
+    const reason = await reasonOf(error, this.#footage!, this.#recordings);
+    if (signal.aborted) return;
     this.#begin();
     this.#become({ kind: "failed", reason });
   }
-}
-
-function durationMs({ start, stop }: Footage): number {
-  return Math.max(0, stop - start) * 1000;
 }

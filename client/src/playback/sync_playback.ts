@@ -4,7 +4,8 @@
 //
 // Why so        Recordings of a camera follow each other without a gap, or with hours between. One player leads: its time is
 //               the playhead. Where its camera has no more, the playhead moves on to whatever comes next on any camera; the
-//               others join as soon as they have something at the playhead, and are realigned when they drift apart.
+//               others join as soon as they have something at the playhead, and are realigned when they drift apart. A pause
+//               shows what each camera had at the time of the leading one's picture.
 
 import type { Footage, Recordings } from "../wire/recordings";
 import type { FootageCache } from "./footage_cache";
@@ -20,14 +21,14 @@ const kMaxGapS = 3;
 /** How far a player may be from the playhead, and how often at most it is brought back. */
 const kMaxApartMs = 1_500;
 const kRejoinIntervalMs = 5_000;
-const kSameFrameMs = 40;
-/** How far ahead the next recording is looked for. */
-const kLookAheadS = 6 * 3600;
+/** How far ahead the next recording is looked for in what is known, before the server is asked. */
+const kLookAheadS = 600;
 
 export class SyncPlayback {
   readonly #recordings: Recordings;
   readonly #cache: FootageCache;
   readonly #changed: () => void;
+  readonly #skipped: (seconds: number) => void;
   #tracks: Track[] = [];
   #lead: Track | null = null;
   #playheadMs: number | null = null;
@@ -37,11 +38,12 @@ export class SyncPlayback {
   /** When a track was last brought to the playhead, and where the playhead was. */
   readonly #joined = new Map<Track, { clockMs: number; atMs: number }>();
 
-  /** `changed` is called whenever there is something else to show. */
-  constructor(recordings: Recordings, cache: FootageCache, changed: () => void) {
+  /** `changed` is called whenever there is something else to show; `skipped` when playing leaves out a gap of that length. */
+  constructor(recordings: Recordings, cache: FootageCache, changed: () => void, skipped: (seconds: number) => void) {
     this.#recordings = recordings;
     this.#cache = cache;
     this.#changed = changed;
+    this.#skipped = skipped;
   }
 
   get tracks(): readonly Track[] {
@@ -83,7 +85,7 @@ export class SyncPlayback {
     this.#playheadMs = atMs;
     this.#isPlaying = isPlaying;
     track.player.setRate(this.#rate);
-    track.player.open(footage, atMs - footage.start * 1000, isPlaying);
+    track.player.open(footage, atMs, isPlaying);
     for (const other of this.#tracks) if (other !== track) this.#join(other, isPlaying);
     this.#changed();
   }
@@ -144,9 +146,9 @@ export class SyncPlayback {
     );
     for (const track of this.#tracks) {
       if (track === this.#lead || performance.now() - (this.#joined.get(track)?.clockMs ?? -Infinity) < kRejoinIntervalMs) continue;
-      const { state, timeMs } = track.player;
+      const { state, positionMs } = track.player;
       const isIdle = state.kind === "empty" || state.kind === "ended";
-      const isApart = state.kind === "playing" && Math.abs(timeMs - playheadMs) > kMaxApartMs;
+      const isApart = state.kind === "playing" && Math.abs(positionMs - playheadMs) > kMaxApartMs;
       if (isIdle || isApart) this.#join(track, true);
     }
   }
@@ -154,17 +156,6 @@ export class SyncPlayback {
   close(): void {
     this.#isPlaying = false;
     for (const { player } of this.#tracks) player.close();
-  }
-
-  /** The recording before (-1) or after (1) the leading one, on its camera and within six hours; null where there is none. */
-  async adjacent(by: 1 | -1): Promise<Footage | null> {
-    const lead = this.#lead;
-    const atS = lead?.player.footage?.start ?? (this.#playheadMs ?? Date.now()) / 1000;
-    if (!lead) return null;
-    const [fromS, toS] = by > 0 ? [atS, atS + kLookAheadS] : [atS - kLookAheadS, atS];
-    await this.#cache.load([lead.camera], fromS, toS);
-    const events = this.#events(lead.camera, fromS, toS);
-    return (by > 0 ? events.find(({ start }) => start > atS) : events.findLast(({ start }) => start < atS)) ?? null;
   }
 
   #newTrack(camera: number): Track {
@@ -175,9 +166,10 @@ export class SyncPlayback {
 
   #follow(track: Track): void {
     if (!this.#tracks.includes(track)) return;
-    const { state, timeMs, footage, rate } = track.player;
+    const { state, timeMs, positionMs, footage, rate } = track.player;
     if (track === this.#lead && footage) {
-      if (state.kind === "playing" || state.kind === "paused") this.#playheadMs = timeMs;
+      if (state.kind === "playing") this.#playheadMs = positionMs;
+      if (state.kind === "paused") this.#playheadMs = timeMs;
       if (state.kind === "ended" && this.#isPlaying) void this.#advance();
       if (state.kind === "failed" || state.kind === "preempted") this.#isPlaying = false;
       // A player slows down when it comes to the end of what is still being recorded.
@@ -190,18 +182,25 @@ export class SyncPlayback {
   #alignOthers(): void {
     for (const other of this.#tracks) {
       if (other === this.#lead || this.#playheadMs === null) continue;
-      const atMs = this.#joined.get(other)?.atMs ?? -Infinity;
-      if (Math.abs(atMs - this.#playheadMs) > kSameFrameMs) this.#join(other, false);
+      if (this.#joined.get(other)?.atMs !== this.#playheadMs) this.#join(other, false);
     }
   }
 
-  /** Shows what the camera has at the playhead. */
-  #join(track: Track, isPlaying: boolean): void {
-    if (this.#playheadMs === null) return;
-    this.#joined.set(track, { clockMs: performance.now(), atMs: this.#playheadMs });
-    const footage = this.#at(track.camera, this.#playheadMs);
-    if (footage) track.player.open(footage, this.#playheadMs - footage.start * 1000, isPlaying);
-    else if (track.player.footage) track.player.close();
+  /** Shows what the camera has at the playhead. What is not known of it is looked up first. */
+  #join(track: Track, isPlaying: boolean, isKnown = false): void {
+    const atMs = this.#playheadMs;
+    if (atMs === null) return;
+    const joined = { clockMs: performance.now(), atMs };
+    this.#joined.set(track, joined);
+    const footage = this.#at(track.camera, atMs);
+    if (footage) return track.player.open(footage, atMs, isPlaying);
+    if (track.player.footage) track.player.close();
+    if (isKnown) return;
+    void this.#cache.load([track.camera], atMs / 1000, atMs / 1000 + 1, true).then(() => {
+      // Meanwhile it may have joined elsewhere.
+      const isWanted = this.#joined.get(track) === joined && this.#tracks.includes(track) && track !== this.#lead;
+      if (isWanted && this.#at(track.camera, atMs)) this.#join(track, this.#isPlaying, true);
+    });
   }
 
   #at(camera: number, atMs: number): Footage | null {
@@ -221,7 +220,11 @@ export class SyncPlayback {
       const next = current && current.kind !== "event" ? null : await this.#next(current);
       // Meanwhile the user may have gone elsewhere.
       if (!this.#isPlaying || (this.#lead?.player.footage ?? null) !== current) return;
-      if (next) this.open(next);
+      const gapS = next && current ? next.start - current.stop : 0;
+      if (gapS > kMaxGapS) this.#skipped(gapS);
+      // Another camera's may have begun long before; of the same one, ends are rounded up.
+      const fromS = current && next?.camera !== current.camera ? current.stop : 0;
+      if (next) this.open(next, Math.max(next.start, fromS) * 1000);
       else if (otherwise) otherwise();
       else this.#isPlaying = false;
     } finally {
@@ -240,7 +243,10 @@ export class SyncPlayback {
       return events.find(isNext) ?? [];
     });
     const followsAtOnce = candidates.find(({ camera, start }) => camera === current?.camera && start <= fromS + kMaxGapS);
-    return followsAtOnce ?? candidates.sort((one, other) => one.start - other.start)[0] ?? null;
+    const known = followsAtOnce ?? candidates.sort((one, other) => one.start - other.start)[0];
+    if (known) return known;
+    const place = { atS: Math.floor(fromS), id: current?.id };
+    return this.#recordings.next({ cameras, kinds: ["continuous", "alarm"], ...place }, false).catch(() => null);
   }
 }
 

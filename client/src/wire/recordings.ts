@@ -44,6 +44,9 @@ export interface Footage extends FootageRef {
   isSaved: boolean;
 }
 
+/** What the user tells apart: recordings by their reason, and marks. */
+export type EventKind = "continuous" | "alarm" | Exclude<FootageKind, "event">;
+
 /** Run lengths of steps, by value: 0 nothing, 1 recorded, 2 an event. */
 export type Runs = [value: number, count: number][];
 
@@ -60,10 +63,27 @@ export interface Group {
   cameras: number[];
 }
 
-/** Where a stream begins: at a frame, or (recorded events only) at the frame of a time since the recording's start. */
-export type Start =
-  /** With `from` the frames from there on come first, as fast as they can. */
-  { index: number; from?: number } | { timeMs: number };
+/** Where a stream begins. With `from` the frames from there on come first, as fast as they can. */
+export interface FrameStart {
+  index: number;
+  from?: number;
+}
+
+/** A place in the order of events, and which events are looked for from there. */
+export interface EventPlace {
+  cameras: readonly number[];
+  kinds: readonly EventKind[];
+  /** Unix seconds. */
+  atS: number;
+  /** Of the event there; without one, what begins at that very second is no neighbour. */
+  id?: number | undefined;
+}
+
+export interface FrameOfTime {
+  index: number;
+  /** Of the whole footage, now. */
+  frameCount: number;
+}
 
 /** How far a stream goes: one frame, all there is, or on with what is still being recorded. */
 export type Extent = "one" | "all" | "growing";
@@ -174,37 +194,55 @@ export class Recordings {
     }
   }
 
+  /** The last frame at or before the time, in Unix milliseconds; the first or the last one for a time outside. */
+  async frameAt({ kind, id }: FootageRef, atMs: number): Promise<FrameOfTime> {
+    const which = { event: String(id), ...kindParameter(kind), time_ms: String(Math.round(atMs)) };
+    type RawFrame = { frame: number; frame_count: number };
+    const { frame, frame_count } = await this.#server.call<RawFrame>("VEXO.Event", "Frame", which);
+    return { index: frame, frameCount: frame_count };
+  }
+
+  /** What can be played behind the place, or before it; null where there is nothing. */
+  async next({ cameras, kinds, atS, id }: EventPlace, isBefore: boolean): Promise<Footage | null> {
+    type RawNext = RawMark | (RawEvent & { kind: "event"; camera_id: number });
+    const { event } = await this.#server.call<{ event: RawNext | null }>("VEXO.Event", "Next", {
+      cameralists: cameras.join(),
+      kinds: kinds.join(),
+      time: String(atS),
+      ...(id === undefined ? {} : { event: String(id) }),
+      ...(isBefore ? { before: "true" } : {}),
+    });
+    if (!event) return null;
+    return event.kind === "event" ? footageOf(event, event.camera_id) : markOf(event);
+  }
+
+  /** The picture that the footage shows at its moment, or so; at least that wide unless the camera's are smaller. */
+  stillAddress({ kind, id, moment }: Footage, widthPx: number): string {
+    const which = { event: String(id), ...kindParameter(kind), time_ms: String(moment * 1000), width: String(widthPx) };
+    return address("VEXO.Picture", "At", which);
+  }
+
   /**
    * Opens a stream of pictures, each behind a part with its frame's index. The caller reads the body and ends it with
    * `signal`. Rejects with a ServerError; its status is 200 where the server shows a warning in place of the footage.
    */
   async play(
     footage: Footage,
-    start: Start,
+    start: FrameStart,
     extent: Extent,
     rate: number,
     key: number,
     signal: AbortSignal,
   ): Promise<Response> {
     const common = { mountid: "0", eventid: String(footage.id), playrate: String(rate), timestamp: String(key) };
-    const [method, rest] =
-      "timeMs" in start
-        ? // Sampled, since only then the frame's index comes with it.
-          [
-            "PlayMjpegEventNoFrameId",
-            { startTimeMS: String(start.timeMs), interval: "0", flushHeader: footage.isGrowing ? "1" : "0" },
-          ]
-        : [
-            "PlayMjpegEvent",
-            {
-              framestart: String(start.from ?? start.index),
-              ...(start.from === undefined ? {} : { interval: "0" }),
-              framestop: String(extent === "one" ? start.index : extent === "all" ? -1 : kFarFrame),
-              recEvtType: String(kKinds[footage.kind]),
-            },
-          ];
+    const range = {
+      framestart: String(start.from ?? start.index),
+      ...(start.from === undefined ? {} : { interval: "0" }),
+      framestop: String(extent === "one" ? start.index : extent === "all" ? -1 : kFarFrame),
+      recEvtType: String(kKinds[footage.kind]),
+    };
     try {
-      const answer = await this.#server.media(kPlayer, method, { ...common, ...rest }, { signal });
+      const answer = await this.#server.media(kPlayer, "PlayMjpegEvent", { ...common, ...range }, { signal });
       if (boundaryOf(answer.headers.get("Content-Type")) !== null) return answer;
       void answer.body?.cancel();
     } catch (error) {
@@ -218,8 +256,10 @@ export class Recordings {
     await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
   }
 
-  downloadAddress({ kind, id }: FootageRef): string {
-    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind) });
+  /** The file is named after its start in this browser's time zone. */
+  downloadAddress({ kind, id, start }: Footage): string {
+    const offset = { utc_offset_min: String(-new Date(start * 1000).getTimezoneOffset()) };
+    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind), ...offset });
   }
 }
 

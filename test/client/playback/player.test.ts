@@ -22,7 +22,7 @@ describe("a player", () => {
     vi.stubGlobal("fetch", archive.fetch);
     archive.recorded = [
       { id: 7, camera: 1, start: 1000, stop: 1010, frames: 100 },
-      { id: 8, camera: 1, start: 1000, stop: 1010, frames: 100, kind: "alert" },
+      { id: 8, camera: 1, start: 1000, stop: 1010, frames: 25, kind: "alert" },
     ];
     archive.asked.length = seen.length = 0;
     player = new Player(new Recordings(new Server(() => undefined)), () => undefined);
@@ -35,14 +35,14 @@ describe("a player", () => {
   });
 
   test("plays from the frame of a time to the end, and closes when the last frame repeats", async () => {
-    player.open(footage(7), 9_400, true);
+    player.open(footage(7), 1_009_400, true);
     await until("ended");
-    expect(archive.asked).toEqual(["event7 time 9400 to -1 at 1", "event7 frame 94 to -1 at 1"]);
-    expect(player.index).toBe(99);
+    expect(archive.asked).toEqual(["event7 frame 94 to -1 at 1"]);
+    expect([player.index, player.timeMs]).toEqual([99, 1_009_900]);
     expect(archive.streams).toEqual([]);
     player.play();
     await until("playing");
-    expect(archive.asked[2]).toBe("event7 frame 0 to -1 at 1");
+    expect(archive.asked[1]).toBe("event7 frame 0 to -1 at 1");
   });
 
   test("pause closes the stream; steps stay within the recording and end at the last one asked for", async () => {
@@ -57,7 +57,7 @@ describe("a player", () => {
     expect(archive.asked.slice(1)).toEqual([1, 5].map((by) => `event7 frame ${at + by} to ${at + by} at 1`));
     player.step(-1000);
     await vi.waitFor(() => expect([player.index, player.state.kind, ...archive.streams]).toEqual([0, "paused"]));
-    player.open(footage(7), 4_000, false);
+    player.open(footage(7), 1_004_000, false);
     await vi.waitFor(() => expect([player.index, player.state.kind]).toEqual([40, "paused"]));
     archive.asked.length = seen.length = 0;
     for (let index = 39; index >= 27; index -= 1) {
@@ -83,11 +83,11 @@ describe("a player", () => {
   });
 
   test("a pause, and playing on, while a time is being looked for goes to that time", async () => {
-    player.open(footage(7), 5_000, true);
+    player.open(footage(7), 1_005_000, true);
     player.pause();
     await until("paused");
     expect(player.index).toBe(50);
-    player.open(footage(7), 2_000, false);
+    player.open(footage(7), 1_002_000, false);
     player.pause();
     player.play();
     await until("playing");
@@ -95,11 +95,32 @@ describe("a player", () => {
     player.close();
   });
 
-  test("a mark is found by frame, since the server knows no times in it", async () => {
-    player.open(footage(8, { kind: "alert" }), 5_000, false);
+  test("a mark's frames have the times that they were taken at, whatever its camera's rate, and end where they end", async () => {
+    player.open(footage(8, { kind: "alert", frameCount: 0 }), 1_005_000, false);
     await until("paused");
-    expect(archive.asked).toEqual(["alert8 frame 50 to 50 at 1"]);
+    expect(archive.asked).toEqual(["alert8 frame 12 to 12 at 1"]);
+    expect([player.timeMs, player.frameCount]).toEqual([1_004_800, 25]);
+    player.step(100);
+    await vi.waitFor(() => expect([player.index, player.timeMs, player.state.kind]).toEqual([24, 1_009_600, "paused"]));
   });
+
+  test.each(["lose", "stall"] as const)("a connection that was lost (%s) is told, and had back at the frame shown", async (how) => {
+    player.open(footage(7), 0, true);
+    await untilFrame(3);
+    archive.isAway = true;
+    archive.streams[0]![how]();
+    await vi.waitFor(() => expect(player.state.kind).toBe("lost"), 12_000);
+    const at = player.index;
+    archive.isAway = false;
+    await until("playing");
+    expect(archive.asked.at(-1)).toBe(`event7 frame ${at} to -1 at 1`);
+    archive.isAway = true;
+    archive.streams[0]!.lose();
+    await until("lost");
+    player.pause();
+    expect(player.state.kind).toBe("paused");
+    archive.isAway = false;
+  }, 30_000);
 
   test("the rate changes within the stream; where the server refuses, another is opened at the frame shown", async () => {
     player.open(footage(7), 0, true);

@@ -21,6 +21,9 @@ interface Stream {
   rate: number;
   /** Ends it as another player does that takes the session. */
   preempt(): void;
+  /** Breaks the connection; leaves it open, but silent. */
+  lose(): void;
+  stall(): void;
 }
 
 const kTailMs = 2_000;
@@ -36,12 +39,17 @@ export class FakeArchive {
   readonly streams: Stream[] = [];
   /** Each stream that was asked for: event, where from, how far, rate. */
   readonly asked: string[] = [];
+  /** The events of which a still was asked for. */
+  readonly stills: string[] = [];
   playersPerSession = 1;
+  /** The server does not answer. */
+  isAway = false;
   framesPerSecond = 100;
   /** Every frame of every recording. */
   picture: Uint8Array = Uint8Array.of(255, 216);
 
   readonly fetch = async (address: string, init: { signal?: AbortSignal; body?: unknown } = {}): Promise<Response> => {
+    if (this.isAway) throw new TypeError("no connection");
     const query = new URLSearchParams(address.slice(address.indexOf("?")));
     for (const [name, value] of new URLSearchParams(String(init.body ?? ""))) query.set(name, value);
     return this.answer(query, init.signal) ?? json(null, 404);
@@ -62,6 +70,17 @@ export class FakeArchive {
         const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
         return !one ? json(null, 404) : json(kind === "event" ? { ...rawEvent(one), camera_id: one.camera } : rawMark(one));
       }
+      case "VEXO.Event Next":
+        return json({ event: this.#next(query) });
+      case "VEXO.Event Frame": {
+        const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === (query.get("kind") ?? "event"));
+        if (!one || one.frames === 0) return json(null, 404);
+        const frame = Math.floor((number("time_ms") - one.start * 1000) / periodMs(one));
+        return json({ frame: Math.max(0, Math.min(frame, one.frames - 1)), frame_count: one.frames, captured_ms: 0 });
+      }
+      case "VEXO.Picture At":
+        this.stills.push(query.get("event") ?? "");
+        return new Response(this.picture.slice(), { headers: { "Content-Type": "image/jpeg" } });
       case "VEXO.Catalog Groups":
         return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
       case "VEXO.Playback SetRate": {
@@ -70,11 +89,23 @@ export class FakeArchive {
         return stream ? json(null) : json(null, 404);
       }
       case "VEXO.Lookhaven.Player PlayMjpegEvent":
-      case "VEXO.Lookhaven.Player PlayMjpegEventNoFrameId":
         return this.#play(query, signal);
       default:
         return undefined;
     }
+  }
+
+  #next(query: URLSearchParams) {
+    const [cameras, kinds] = [idsOf(query), query.get("kinds")?.split(",")];
+    const isBefore = query.get("before") === "true";
+    const place = [Number(query.get("time")), Number(query.get("event") ?? (isBefore ? 0 : Infinity))] as const;
+    const order = (one: Recorded) => one.start - place[0] || one.id - place[1];
+    const kindOf = ({ kind = "event", reason = 1 }: Recorded) => (kind !== "event" ? kind : reason === 1 ? "continuous" : "alarm");
+    const found = this.recorded
+      .filter((one) => cameras.includes(one.camera) && kinds?.includes(kindOf(one)) !== false && (isBefore ? order(one) < 0 : order(one) > 0))
+      .sort((one, other) => (isBefore ? -1 : 1) * (one.start - other.start || one.id - other.id))[0];
+    if (!found) return null;
+    return (found.kind ?? "event") === "event" ? { ...rawEvent(found), kind: "event", camera_id: found.camera } : rawMark(found);
   }
 
   #overlapping(camera: number, from: number, to: number, isMark: boolean): Recorded[] {
@@ -107,19 +138,23 @@ export class FakeArchive {
     const number = (name: string, otherwise: number) => Number(query.get(name) ?? otherwise);
     const kind = (["event", "alert", "pos"] as const)[number("recEvtType", 0)];
     const found = this.recorded.find((one) => one.id === number("eventid", 0) && (one.kind ?? "event") === kind);
-    const duration = found ? (found.stop - found.start) * 1000 : 0;
-    const byTime = query.has("startTimeMS");
-    const from = byTime ? Math.floor((number("startTimeMS", 0) / duration) * (found?.frames ?? 0)) : number("framestart", 0);
-    const stop = byTime ? -1 : number("framestop", -1);
+    const from = number("framestart", 0);
+    const stop = number("framestop", -1);
     const rate = number("playrate", 1);
-    this.asked.push(`${kind}${number("eventid", 0)} ${byTime ? "time" : "frame"} ${byTime ? number("startTimeMS", 0) : from} to ${stop} at ${rate}`);
+    this.asked.push(`${kind}${number("eventid", 0)} frame ${from} to ${stop} at ${rate}`);
     if (!found || from >= found.frames) return new Response("", { headers: { "Content-Type": "image/png" } });
-    return this.#stream(found, from, stop < from ? found.frames - 1 : stop, number("timestamp", 0), rate, byTime, signal);
+    return this.#stream(found, from, stop < from ? found.frames - 1 : stop, number("timestamp", 0), rate, query.has("interval"), signal);
   }
 
   #stream(found: Recorded, from: number, stop: number, key: number, rate: number, isSampled: boolean, signal?: AbortSignal) {
     const ended = new AbortController();
-    const stream: Stream = { key, rate, preempt: () => ended.abort() };
+    const lost = new AbortController();
+    let isStalled = false;
+    const lose = () => {
+      lost.abort();
+      ended.abort();
+    };
+    const stream: Stream = { key, rate, preempt: () => ended.abort(), lose, stall: () => (isStalled = true) };
     const wait = (ms: number) => setTimeout(ms, undefined, { signal: ended.signal }).catch(() => undefined);
     // A newer player of the session takes the place of the oldest.
     if (this.streams.length >= this.playersPerSession) this.streams[0]!.preempt();
@@ -129,9 +164,10 @@ export class FakeArchive {
     const send = async (controller: ReadableStreamDefaultController<Uint8Array>) => {
       for (let index = from; !ended.signal.aborted; ) {
         // A browser that does not read holds the server back.
-        if ((controller.desiredSize ?? 0) > -20) {
+        if (!isStalled && (controller.desiredSize ?? 0) > -20) {
           controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
-          controller.enqueue(part("image/jpeg", this.picture));
+          const captured = `X-Capture-Time: ${(found.start + (index * periodMs(found)) / 1000).toFixed(3)}\r\n`;
+          controller.enqueue(part("image/jpeg", this.picture, captured));
           index = Math.min(stop, index + Math.max(1, isSampled ? 1 : stream.rate));
         }
         await wait((1000 / this.framesPerSecond) * Math.max(1, -stream.rate));
@@ -139,7 +175,7 @@ export class FakeArchive {
         if (index >= found.frames) await wait(kTailMs);
         if (index >= found.frames) ended.abort();
       }
-      if (signal?.aborted) controller.error(new DOMException("left", "AbortError"));
+      if (signal?.aborted || lost.signal.aborted) controller.error(new DOMException("left", "AbortError"));
       else controller.close();
     };
     const body = new ReadableStream<Uint8Array>({ start: (controller) => void send(controller) });
@@ -159,7 +195,12 @@ function rawMark({ id, kind, camera, start, stop, text = "" }: Recorded) {
   return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", reported_by: "till", text: text.split("\n") };
 }
 
-function part(type: string, body: Uint8Array): Uint8Array {
-  const head = Buffer.from(`--${kBoundary}\r\nContent-Type: ${type}\r\nContent-Length: ${body.length}\r\n\r\n`);
+/** Of a camera of constant frame rate. */
+function periodMs({ start, stop, frames }: Recorded): number {
+  return ((stop - start) * 1000) / frames;
+}
+
+function part(type: string, body: Uint8Array, more = ""): Uint8Array {
+  const head = Buffer.from(`--${kBoundary}\r\nContent-Type: ${type}\r\nContent-Length: ${body.length}\r\n${more}\r\n`);
   return Buffer.concat([head, body, Buffer.from("\r\n")]);
 }

@@ -64,7 +64,7 @@ export class FakeServer {
     if (method! in this.answers) return json(answer, 200, { success: true, data: this.answers[method!] });
     if (method === "Get" && searchParams.get("api") === "VEXO.Picture") return this.#snapshot(answer);
     if (method === "Play") return this.#play(searchParams, answer);
-    if (/VEXO\.(Playback|Event|Catalog)|Player$/.test(searchParams.get("api")!) && method !== "LoadCamera") {
+    if (/VEXO\.(Playback|Event|Catalog|Picture)|Player$/.test(searchParams.get("api")!) && method !== "LoadCamera") {
       return void this.#recordings(searchParams, request, answer);
     }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));

@@ -1,14 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The events and marks of a span as rows, newest first; only the rows on the screen exist.
+// The events and marks of a span as cards with a picture each, newest first; only those on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
 import { isSameFootage, describeMark, type Footage, type FootageRef } from "../../wire/recordings";
 import { element, setText } from "../widgets/dom";
-import { clockTime, duration, shortDate } from "../widgets/text";
+import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
+import { StillLoader } from "./still_loader";
 
 /** Rows kept beyond the visible ones, so that scrolling shows no gap. */
 const kOverscanRows = 4;
+/** Of a still, on a screen with two pixels to each of the page's. */
+const kStillPx = 176;
 
 export const kKindNames: Record<EventKind, string> = {
   continuous: "Continuous",
@@ -17,10 +20,17 @@ export const kKindNames: Record<EventKind, string> = {
   pos: "POS",
 };
 
+/** "24 Nov 01:45 · Parking". */
+export function eventText({ moment, camera }: Footage, nameOf: (camera: number) => string): string {
+  return `${minuteText(moment * 1000)} · ${nameOf(camera)}`;
+}
+
 export class EventList {
   readonly root: HTMLElement;
   readonly #onOpen: (footage: Footage) => void;
   readonly #nameOf: (camera: number) => string;
+  readonly #stillAddress: (footage: Footage, widthPx: number) => string;
+  readonly #stills = new StillLoader();
   readonly #head = element("h2", { class: "list-head" });
   readonly #box = element("div", { class: "list-box" });
   readonly #space = element("div", { class: "list-space", role: "list" });
@@ -32,8 +42,13 @@ export class EventList {
   /** The row that the keys move. */
   #at = 0;
 
-  constructor(nameOf: (camera: number) => string, onOpen: (footage: Footage) => void) {
+  constructor(
+    nameOf: (camera: number) => string,
+    stillAddress: (footage: Footage, widthPx: number) => string,
+    onOpen: (footage: Footage) => void,
+  ) {
     this.#nameOf = nameOf;
+    this.#stillAddress = stillAddress;
     this.#onOpen = onOpen;
     this.#box.append(this.#space, this.#note);
     this.root = element("section", { class: "list", "aria-label": "Events" }, this.#head, this.#box);
@@ -64,6 +79,7 @@ export class EventList {
 
   close(): void {
     this.#resized.disconnect();
+    this.#stills.close();
   }
 
   get #rowPx(): number {
@@ -97,14 +113,21 @@ export class EventList {
       this.#fill(made, one, first + index, row);
       return made;
     });
-    for (const child of [...this.#space.children]) if (!wanted.includes(child as HTMLElement)) child.remove();
+    for (const child of [...this.#space.children]) if (!wanted.includes(child as HTMLElement)) this.#remove(child);
     for (const made of wanted) if (!made.isConnected) this.#space.append(made);
   }
 
-  #newRow({ kind, id }: FootageRef): HTMLElement {
+  #remove(row: Element): void {
+    this.#stills.drop(row.querySelector("img")!);
+    row.remove();
+  }
+
+  #newRow(one: Footage): HTMLElement {
     const parts = ["row-swatch", "row-time", "row-name", "row-text", "row-side"].map((name) => element("span", { class: name }));
-    const button = element("button", { type: "button", class: "row-open" }, ...parts);
-    const row = element("div", { class: "row", role: "listitem", "data-ref": `${kind}${id}` }, button);
+    const still = element("img", { class: "row-still", alt: "" });
+    const button = element("button", { type: "button", class: "row-open" }, ...parts, still);
+    const row = element("div", { class: "row", role: "listitem", "data-ref": `${one.kind}${one.id}` }, button);
+    if (one.isSaved) this.#stills.load(still, this.#stillAddress(one, kStillPx));
     button.addEventListener("click", () => {
       const one = this.#footage[Number(row.dataset["at"])];
       if (one) this.#onOpen(one);

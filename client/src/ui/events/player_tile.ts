@@ -6,11 +6,11 @@ import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
-import { clockTime, shortDate } from "../widgets/text";
+import { clockTime, preciseTime, shortDate } from "../widgets/text";
 
 export class PlayerTile {
   readonly root: HTMLElement;
-  readonly #player: Player;
+  readonly player: Player;
   readonly #canvas = element("canvas", { role: "img" });
   readonly #time = element("time", { class: "stage-time" });
   readonly #sentence = element("p", { class: "message-sentence", role: "status" });
@@ -18,7 +18,7 @@ export class PlayerTile {
 
   /** `onAgain` is called when the user wants to play what has stopped. */
   constructor(name: string, player: Player, onAgain: () => void) {
-    this.#player = player;
+    this.player = player;
     player.show = async ({ jpeg }, signal) => {
       const image = await createImageBitmap(jpeg);
       // A pause while it was being decoded keeps the previous frame, whose number the player reports.
@@ -45,11 +45,11 @@ export class PlayerTile {
 
   /** `playheadMs` is named where nothing was recorded then. */
   refresh(playheadMs: number | null): void {
-    const { state, footage, timeMs } = this.#player;
+    const { state, footage, timeMs } = this.player;
     this.root.dataset["state"] = state.kind;
     // A picture of another time must not be taken for this one.
     if (state.kind === "empty") this.root.classList.remove("has-picture");
-    setText(this.#time, footage ? `${shortDate(timeMs)} ${clockTime(timeMs)}` : "");
+    setText(this.#time, footage ? `${shortDate(timeMs)} ${preciseTime(timeMs)}` : "");
     setText(this.#sentence, sentenceFor(state, playheadMs));
     const again = state.kind === "preempted" ? "Play here" : state.kind === "failed" ? "Try again" : "";
     setText(this.#again, again);
@@ -64,6 +64,8 @@ function sentenceFor(state: PlayerState, playheadMs: number | null): string {
       return `Nothing recorded at ${clockTime(playheadMs)}.`;
     case "failed":
       return state.reason;
+    case "lost":
+      return "The connection was lost. Playing goes on as soon as it is back.";
     case "preempted":
       return "Playback was stopped because another window of this session started playing.";
     default:

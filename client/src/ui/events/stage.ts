@@ -27,9 +27,12 @@ export class Stage {
   }
 
   show(cameras: readonly number[]): void {
+    const before = this.#tiles;
     this.#playback.setCameras(cameras);
+    // A paused player does not draw its picture again, so its tile stays.
     this.#tiles = this.#playback.tracks.map(({ camera, player }) => {
-      return new PlayerTile(this.#nameOf(camera), player, () => this.#playback.play());
+      const kept = before.find((tile) => tile.player === player);
+      return kept ?? new PlayerTile(this.#nameOf(camera), player, () => this.#playback.play());
     });
     this.root.dataset["players"] = String(this.#tiles.length);
     this.root.replaceChildren(...this.#tiles.map(({ root }) => root));

@@ -2,13 +2,15 @@
 //
 // The transport controls below the stage: play, step, rate, what is playing, download.
 
+import type { EventWalk } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
 import type { SyncPlayback } from "../../playback/sync_playback";
-import type { Recordings } from "../../wire/recordings";
+import type { Footage, Recordings } from "../../wire/recordings";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
-import { clockTime, rateText, shortDate } from "../widgets/text";
+import { preciseTime, rateText, shortDate } from "../widgets/text";
+import { eventText } from "./event_list";
 
 export interface TransportActions {
   toggle(): void;
@@ -24,16 +26,30 @@ export class Transport {
   readonly root: HTMLElement;
   readonly #playback: SyncPlayback;
   readonly #recordings: Recordings;
+  readonly #walk: EventWalk;
+  readonly #nameOf: (camera: number) => string;
   readonly #play: HTMLButtonElement;
+  readonly #before: HTMLButtonElement;
+  readonly #after: HTMLButtonElement;
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
   readonly #time = element("time", { class: "transport-time" });
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing", hidden: true }, "recording");
   readonly #download = element("a", { class: "icon-button", "aria-label": "Download this recording", title: "Download this recording" });
 
-  constructor(playback: SyncPlayback, recordings: Recordings, actions: TransportActions) {
+  constructor(
+    playback: SyncPlayback,
+    recordings: Recordings,
+    walk: EventWalk,
+    nameOf: (camera: number) => string,
+    actions: TransportActions,
+  ) {
     this.#playback = playback;
     this.#recordings = recordings;
+    this.#walk = walk;
+    this.#nameOf = nameOf;
+    this.#before = iconButton("eventBefore", "Previous event", () => actions.skip(-1));
+    this.#after = iconButton("eventAfter", "Next event", () => actions.skip(1));
     this.#play = iconButton("play", "Play", () => actions.toggle(), "Space");
     this.#play.classList.add("play");
     this.#play.append(icon("pause"));
@@ -43,11 +59,11 @@ export class Transport {
     const buttons = element(
       "div",
       { class: "transport-buttons", role: "group", "aria-label": "Playback" },
-      iconButton("eventBefore", "Previous event", () => actions.skip(-1), "↑"),
+      this.#before,
       iconButton("stepBack", "Previous frame", () => actions.step(-1), "←"),
       this.#play,
       iconButton("stepForward", "Next frame", () => actions.step(1), "→"),
-      iconButton("eventAfter", "Next event", () => actions.skip(1), "↓"),
+      this.#after,
       this.#rate,
     );
     const about = element("div", { class: "transport-about" }, this.#time, this.#growing, this.#frame);
@@ -69,11 +85,22 @@ export class Transport {
     this.#play.title = `${isPlaying ? "Pause" : "Play"} (Space)`;
     this.root.dataset["playing"] = String(isPlaying);
     if (this.#rate.value !== String(rate)) this.#rate.value = String(rate);
-    setText(this.#time, playheadMs === null ? "" : `${shortDate(playheadMs)} ${clockTime(playheadMs)}`);
+    setText(this.#time, playheadMs === null ? "" : `${shortDate(playheadMs)} ${preciseTime(playheadMs)}`);
+    this.#name(this.#before, "Previous event", this.#walk.peek(-1), "↑");
+    this.#name(this.#after, "Next event", this.#walk.peek(1), "↓");
     this.#growing.hidden = !footage?.isGrowing;
-    const frames = footage && footage.frameCount > 0 && !footage.isGrowing ? ` of ${footage.frameCount}` : "";
+    const frameCount = lead?.player.frameCount ?? 0;
+    const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
     setText(this.#frame, footage ? `frame ${(lead?.player.index ?? 0) + 1}${frames}` : "");
     if (footage) this.#download.href = this.#recordings.downloadAddress(footage);
     else this.#download.removeAttribute("href");
+  }
+
+  #name(button: HTMLButtonElement, what: string, event: Footage | null | undefined, key: string): void {
+    const told = event ? `: ${eventText(event, this.#nameOf)}` : event === null ? ": none" : "";
+    const label = what + told;
+    if (button.getAttribute("aria-label") === label) return;
+    button.setAttribute("aria-label", label);
+    button.title = `${label} (${key})`;
   }
 }

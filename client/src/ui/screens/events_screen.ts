@@ -3,15 +3,16 @@
 // The recordings of all cameras: the stage with its players, the timeline below; calendar, filter and list beside.
 
 import { kindOf } from "../../playback/coverage";
+import { EventWalk, type Direction } from "../../playback/event_walk";
 import { FootageCache } from "../../playback/footage_cache";
 import { kRates } from "../../playback/player_state";
 import { RecordedDays } from "../../playback/recorded_days";
 import { SyncPlayback } from "../../playback/sync_playback";
-import { isSameFootage, Recordings, type Footage } from "../../wire/recordings";
+import { isSameFootage, Recordings, type EventPlace, type Footage } from "../../wire/recordings";
 import { ServerError, type Camera } from "../../wire/server";
 import { Calendar } from "../events/calendar";
 import { EventFilter } from "../events/event_filter";
-import { EventList } from "../events/event_list";
+import { EventList, eventText } from "../events/event_list";
 import { Stage } from "../events/stage";
 import { Transport } from "../events/transport";
 import { spanText } from "../timeline/time_scale";
@@ -20,6 +21,7 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { toggleFullScreen } from "../widgets/full_screen";
 import { notify } from "../widgets/notice";
+import { spanInWords } from "../widgets/text";
 import { openFootage, recordFootage } from "./route";
 import { Screen, type Session } from "./screen";
 
@@ -37,9 +39,19 @@ export class EventsScreen extends Screen {
   readonly #recordings = new Recordings(this.server);
   readonly #cache = new FootageCache(this.#recordings, () => this.#showFootage());
   readonly #days = new RecordedDays(this.#recordings, () => this.#showDays());
-  readonly #playback = new SyncPlayback(this.#recordings, this.#cache, () => this.#showPlaybackSoon());
+  readonly #playback = new SyncPlayback(
+    this.#recordings,
+    this.#cache,
+    () => this.#showPlaybackSoon(),
+    (seconds) => notify(`Skipped ${spanInWords(seconds)} without recordings.`),
+  );
+  readonly #walk = new EventWalk(this.#recordings, () => this.#place(), () => this.#showPlaybackSoon());
   readonly #filter = new EventFilter(() => this.#showLanes());
-  readonly #list = new EventList((camera) => this.#nameOf(camera), (footage) => this.#open(footage));
+  readonly #list = new EventList(
+    (camera) => this.#nameOf(camera),
+    (footage, widthPx) => this.#recordings.stillAddress(footage, widthPx),
+    (footage) => this.#open(footage),
+  );
   readonly #stage: Stage;
   readonly #timeline: Timeline;
   readonly #calendar: Calendar;
@@ -65,7 +77,7 @@ export class EventsScreen extends Screen {
       moved: () => this.#onTimelineMoved(),
     });
     this.#calendar = new Calendar(this.#days, () => this.#chosenCameras(), (dayMs) => this.#pickDay(dayMs));
-    this.#transport = new Transport(this.#playback, this.#recordings, {
+    this.#transport = new Transport(this.#playback, this.#recordings, this.#walk, (camera) => this.#nameOf(camera), {
       toggle: () => this.#togglePlaying(),
       step: (by) => this.#playback.step(by),
       skip: (by) => void this.#skip(by),
@@ -171,11 +183,11 @@ export class EventsScreen extends Screen {
     }
   }
 
-  #open(footage: Footage): void {
+  #open(footage: Footage, isPlaying = true): void {
     this.#filter.include(footage.camera);
     this.#stage.include(footage.camera);
     this.#timeline.reveal(footage.start * 1000);
-    this.#playback.open(footage);
+    this.#playback.open(footage, footage.start * 1000, isPlaying);
   }
 
   #seek(atMs: number, camera: number): void {
@@ -249,6 +261,7 @@ export class EventsScreen extends Screen {
     this.#timeline.setPlayhead(this.#playback.playheadMs, footage, this.#playback.isPlaying);
     this.#transport.refresh();
     this.#list.select(footage);
+    this.#walk.refresh();
     if (!footage) return;
     this.#opening = "";
     recordFootage(footage);
@@ -268,11 +281,25 @@ export class EventsScreen extends Screen {
     else this.#playback.play();
   }
 
-  async #skip(by: 1 | -1): Promise<void> {
-    const next = await this.#playback.adjacent(by);
-    if (!next) return notify(`There is no ${by > 0 ? "later" : "earlier"} event within six hours.`);
-    this.#timeline.reveal(next.start * 1000);
-    this.#playback.open(next, next.start * 1000, this.#playback.isPlaying);
+  /** Where the walk through the events is, and which it stops at. */
+  #place(): EventPlace | null {
+    const cameras = this.#chosenCameras();
+    if (cameras.length === 0) return null;
+    const kinds = [...this.#filter.kinds];
+    const footage = this.#playback.lead?.player.footage;
+    if (footage) return { cameras, kinds, atS: footage.start, id: footage.id };
+    return { cameras, kinds, atS: Math.floor((this.#playback.playheadMs ?? Date.now()) / 1000) };
+  }
+
+  async #skip(by: Direction): Promise<void> {
+    try {
+      const next = await this.#walk.find(by);
+      if (!next) return notify(`There is no ${by > 0 ? "later" : "earlier"} event of these cameras and kinds.`);
+      notify(eventText(next, (camera) => this.#nameOf(camera)));
+      this.#open(next, this.#playback.isPlaying);
+    } catch (error) {
+      notify(error instanceof ServerError ? error.message : String(error));
+    }
   }
 
   /** What nobody sees is not played. */

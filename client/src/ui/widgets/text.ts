@@ -12,6 +12,11 @@ export function clockTime(unixMs: number): string {
   return [time.getHours(), time.getMinutes(), time.getSeconds()].map(two).join(":");
 }
 
+/** hh:mm:ss.t in the browser's time zone. The tenth is the one that has begun. */
+export function preciseTime(unixMs: number): string {
+  return `${clockTime(unixMs)}.${Math.floor((unixMs % 1000) / 100)}`;
+}
+
 /** yyyy-mm-dd in the browser's time zone. */
 export function calendarDate(unixMs: number): string {
   const time = new Date(unixMs);
@@ -26,6 +31,13 @@ export function shortDate(unixMs: number): string {
   return kDayAndMonth.format(unixMs).replace(",", "");
 }
 
+const kDayAndMinute = new Intl.DateTimeFormat("en-GB", { day: "numeric", month: "short", hour: "2-digit", minute: "2-digit" });
+
+/** "24 Nov 01:45" in the browser's time zone. */
+export function minuteText(unixMs: number): string {
+  return kDayAndMinute.format(unixMs).replace(",", "");
+}
+
 /** "November 2026". */
 export function monthName(unixMs: number): string {
   return kMonthAndYear.format(unixMs);
@@ -36,6 +48,15 @@ export function duration(seconds: number): string {
   const [hours, rest] = [Math.floor(seconds / 3600), Math.floor(seconds) % 3600];
   const minutes = Math.floor(rest / 60);
   return `${hours > 0 ? `${hours}:${two(minutes)}` : minutes}:${two(rest % 60)}`;
+}
+
+/** "12 s", "5 min", "3 h 29 min", "2 d 4 h". */
+export function spanInWords(seconds: number): string {
+  const [minutes, hours, days] = [60, 3600, 86_400].map((unit) => Math.floor(seconds / unit)) as [number, number, number];
+  const pair = (whole: string, rest: number, unit: string) => (rest > 0 ? `${whole} ${rest} ${unit}` : whole);
+  if (days > 0) return pair(`${days} d`, hours % 24, "h");
+  if (hours > 0) return pair(`${hours} h`, minutes % 60, "min");
+  return minutes > 0 ? `${minutes} min` : `${Math.round(seconds)} s`;
 }
 
 /** "½×" for slow motion by a factor of two, "4×" for four times as fast. */

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Texts for the user: file names.
+// Texts for the user: file names, times and spans.
 
-import { snapshotFileName } from "../../../../client/src/ui/widgets/text";
+import { minuteText, preciseTime, snapshotFileName, spanInWords } from "../../../../client/src/ui/widgets/text";
 
 test.each([
   ["Entrance", "Entrance_2026-11-04_09-05-07.jpg"],
@@ -12,4 +12,11 @@ test.each([
   ["..", "camera_2026-11-04_09-05-07.jpg"],
 ])("file name of a snapshot of %j", (name, file) => {
   expect(snapshotFileName(name, new Date(2026, 10, 4, 9, 5, 7).getTime())).toBe(file);
+});
+
+test("times to the tenth that has begun, and spans in words", () => {
+  expect(preciseTime(new Date(2026, 10, 4, 9, 5, 7, 999).getTime())).toBe("09:05:07.9");
+  expect(minuteText(new Date(2026, 10, 24, 1, 45).getTime())).toBe("24 Nov 01:45");
+  const spans = [4.4, 60, 12_540, 7_200, 86_400 * 2 + 3_600 * 4 + 59];
+  expect(spans.map(spanInWords)).toEqual(["4 s", "1 min", "3 h 29 min", "2 h", "2 d 4 h"]);
 });

@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which frame is on the screen, and what time it is there.
+//
+// Why so        The caption tells when the picture was taken. A slow camera's picture is repeated each second until the next
+//               comes: the playhead goes on meanwhile.
+
+import type { RecordedFrame } from "./frame_stream";
+
+/** The server repeats a picture when the next is further away. */
+export const kMaxFrameMs = 1_000;
+
+export class ShownFrame {
+  #index = 0;
+  #capturedMs = 0;
+  #positionMs = 0;
+
+  get index(): number {
+    return this.#index;
+  }
+
+  /** Unix milliseconds at which the picture was taken; before the first one, of the time that was asked for. */
+  get capturedMs(): number {
+    return this.#capturedMs;
+  }
+
+  /** The same, but going on while the picture is repeated. */
+  get positionMs(): number {
+    return this.#positionMs;
+  }
+
+  /** Nothing of a recording is shown yet, of which that time was asked for. */
+  reset(atMs: number): void {
+    this.#index = 0;
+    this.#capturedMs = this.#positionMs = atMs;
+  }
+
+  take({ index, capturedMs }: RecordedFrame): void {
+    const isRepeated = capturedMs === this.#capturedMs && index > this.#index;
+    this.#positionMs = isRepeated ? this.#positionMs + (index - this.#index) * kMaxFrameMs : capturedMs;
+    this.#capturedMs = capturedMs;
+    this.#index = index;
+  }
+}
