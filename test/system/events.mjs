@@ -79,11 +79,13 @@ await visit(async (page, complaints) => {
 
   for (const mark of process.env.MARKS.split(",")) {
     await page.goto(`${address}#${mark}`);
+    const [kind, id] = mark.split("=");
+    await page.locator(`.transport a[href*="event=${id}&kind=${kind}"]`).waitFor();
     await page.waitForFunction(() => /^frame ([5-9]|\d\d)/.test(document.querySelector(".transport-frame").textContent));
     await page.keyboard.press(" ");
     await settled("paused");
     const after = page.locator('[aria-label^="Next event: "]');
-    await report(mark.split("=")[0], { ...(await shown()), next: await after.getAttribute("aria-label", { timeout: 5000 }) });
+    await report(kind, { ...(await shown()), next: await after.getAttribute("aria-label", { timeout: 5000 }) });
   }
   await page.keyboard.press("ArrowDown");
   await page.locator(".notice.shown").waitFor();

@@ -177,7 +177,7 @@ class PlaybackTest(unittest.TestCase):
         """One of camera 1, and the recording that it lies in."""
         mark = self.server.request(call("VEXO.Event", "List", kind=kind, cameralists=1), "admin").json["data"]["event"][0]
         self.assertEqual(mark["state"], "saved")
-        events = recorded_events(self.server, 1)
+        events = recorded_events(self.server, 1, **{"from": mark["start"] - 60})
         return mark, next(event for event in events if event["start"] <= mark["start"] < event["stop"])
 
     def test_gives_a_picture_of_any_time(self):
