@@ -13,8 +13,10 @@ std::filesystem::path DefaultHome() {
 
 bool IsStateFolder(const std::filesystem::path& home) {
     std::error_code ignored;
-    for (const char* file : {"lookhaven.db", "store", "debug-log", "run/server.lock"}) {
-        if (std::filesystem::is_regular_file(home / file, ignored)) {
+    for (const char* file :
+         {"lookhaven.db", "store", "debug-log", "run/server.lock", "run/webapi.sock", "tls/made-here"}) {
+        if (const auto status = std::filesystem::status(home / file, ignored);
+            std::filesystem::is_regular_file(status) || std::filesystem::is_socket(status)) {
             return true;
         }
     }

@@ -11,7 +11,7 @@ namespace lookhaven::base {
 // that depends on the working folder.
 std::filesystem::path DefaultHome();
 
-// Whether lookhaven init or the first start has left its files in the folder. Any other is not ours to change.
+// Whether lookhaven init, the first start or a service has left files in the folder. Any other is not ours to change.
 bool IsStateFolder(const std::filesystem::path& home);
 
 }  // namespace lookhaven::base

@@ -77,6 +77,7 @@ Server::Server(const base::Installation& installation, Callbacks callbacks, List
 
 void Server::Run() {
     std::array<epoll_event, 64> events{};
+    base::TellReady();
     while (!ending_ || !processes_.IsEmpty()) {
         const int timeout = MillisUntil(DoWhatIsDue());
         const int ready = ::epoll_wait(poll_.Get(), events.data(), static_cast<int>(events.size()), timeout);
@@ -246,6 +247,7 @@ void Server::BeginShutdown() {
     signalfd_siginfo signal{};
     [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
     ending_ = true;
+    base::TellStopping();
     watcher_due_ = accept_due_ = Clock::time_point::max();
     listener_.Close();
     connections_.clear();
@@ -261,7 +263,11 @@ Clock::time_point Server::DoWhatIsDue() {
         Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
         accept_due_ = Clock::time_point::max();
     }
-    Clock::time_point next = std::min({processes_.SendDueSignals(now), watcher_due_, accept_due_});
+    if (now >= alive_due_) {
+        base::TellAlive();
+        alive_due_ = now + alive_interval_;
+    }
+    Clock::time_point next = std::min({processes_.SendDueSignals(now), watcher_due_, accept_due_, alive_due_});
     for (auto at = connections_.begin(); at != connections_.end();) {
         Connection& connection = at->second;
         if (now >= connection.until && !connection.refused) {

@@ -16,6 +16,7 @@
 
 #include "standalone/base/file_descriptor.h"
 #include "standalone/base/installation.h"
+#include "standalone/base/service_manager.h"
 #include "standalone/control/slot_table.h"
 #include "standalone/host/child.h"
 #include "standalone/host/listener.h"
@@ -89,6 +90,8 @@ class Server {
     pid_t watcher_pid_ = 0;
     Clock::time_point watcher_due_ = Clock::time_point::min();  // when to start it
     Clock::time_point accept_due_ = Clock::time_point::max();   // when to listen again
+    const std::chrono::milliseconds alive_interval_ = base::AliveInterval();
+    Clock::time_point alive_due_ = Clock::time_point::min();
     bool ending_ = false;
 };
 

@@ -14,6 +14,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/base/service_manager.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/instance_lock.h"
@@ -43,9 +44,12 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
     base::RaiseDescriptorLimit();  // each camera costs several
     recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit);
     base::LogInfo("started for " + installation.Home().string());
+    base::TellReady();
     while (g_stop == 0) {
         supervisor.Step();
+        base::TellAlive();
     }
+    base::TellStopping();
     const bool has_finished = supervisor.Finish(kFinishLimit);
     ring::RetireAll(installation);  // also of earlier recorders, that were killed
     if (!has_finished) {

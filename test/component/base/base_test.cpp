@@ -1,12 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What every process relies on: process identities, files that are replaced whole, the state folder.
+#include <algorithm>
+#include <array>
+#include <chrono>
+#include <cstddef>
+#include <cstdlib>
 #include <filesystem>
+#include <string>
 #include <system_error>
+#include <tuple>
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -15,6 +24,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/base/service_manager.h"
 #include "test/support/folder.h"
 #include "test/support/process.h"
 
@@ -103,6 +113,40 @@ TEST_F(FileTest, OneStateFolderIsOneInstallationUnderAnyName) {
     WriteFileAtomically(path_ / "home" / "store", "postgresql://host/db\n");
     EXPECT_EQ(Installation(path_ / "home").StoreUrl(), "postgresql://host/db");
     EXPECT_EQ(Installation(path_ / "other").StoreUrl(), "sqlite:" + (path_ / "other" / "lookhaven.db").string());
+}
+
+TEST_F(FileTest, TheServiceManagerIsToldWhereItListens) {
+    const std::string file = (path_ / "notify").string();
+    for (const std::string& name : {file, "@" + file}) {
+        const FileDescriptor socket(::socket(AF_UNIX, SOCK_DGRAM | SOCK_NONBLOCK, 0));
+        sockaddr_un address{.sun_family = AF_UNIX, .sun_path = {}};
+        name.copy(address.sun_path, name.size());
+        std::replace(address.sun_path, address.sun_path + 1, '@', '\0');
+        const auto size = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
+        ASSERT_EQ(::bind(socket.Get(), reinterpret_cast<const sockaddr*>(&address), size), 0) << name;
+        ::setenv("NOTIFY_SOCKET", name.c_str(), 1);
+        TellReady();
+        std::array<char, 64> told{};
+        EXPECT_EQ(::recv(socket.Get(), told.data(), told.size(), 0), 7) << name;
+        EXPECT_STREQ(told.data(), "READY=1");
+    }
+    ::unsetenv("NOTIFY_SOCKET");
+    TellReady();
+}
+
+TEST(ServiceManagerTest, TheWatchdogsLimitIsHalvedAndNoOtherProcesss) {
+    using std::chrono::milliseconds;
+    const std::string own = std::to_string(::getpid());
+    for (const auto& [limit_us, process, interval] : {std::tuple{"30000000", own, milliseconds(15'000)},
+                                                      {"30000000", std::string("1"), milliseconds(3'600'000)},
+                                                      {"0", own, milliseconds(3'600'000)},
+                                                      {"soon", own, milliseconds(3'600'000)}}) {
+        ::setenv("WATCHDOG_USEC", limit_us, 1);
+        ::setenv("WATCHDOG_PID", process.c_str(), 1);
+        EXPECT_EQ(AliveInterval(), interval) << limit_us << ' ' << process;
+    }
+    ::unsetenv("WATCHDOG_USEC");
+    ::unsetenv("WATCHDOG_PID");
 }
 
 TEST(LogTest, ALineSteersNoTerminal) {
