@@ -1,14 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven demo: everything that can be tried without a camera.
+#include <chrono>
+#include <filesystem>
 #include <optional>
 #include <stdexcept>
+#include <thread>
 
 #include "standalone/base/clock.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/demo/events.h"
 #include "standalone/demo/footage.h"
+#include "standalone/demo/removal.h"
 #include "standalone/demo/setup.h"
 #include "standalone/store/events.h"
 
@@ -59,6 +63,24 @@ void RemoveEvents(const Console& console) {
     console.Answer(Object("removed", removed), "Removed ", removed, " generated events, alerts and POS transactions.");
 }
 
+void Remove(const Console& console) {
+    store::Store store = console.OpenStore();
+    const std::filesystem::path home = console.Installation().Home();
+    demo::RemovalResult removed = demo::Remove(store, home);
+    for (int tries = 0; removed.growing > 0 && tries < 30; ++tries) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(100));
+        removed = demo::Remove(store, home);
+    }
+    if (removed.growing > 0) {
+        throw Failure(kUnavailable, "the demo's cameras are disabled, but ", removed.growing,
+                      " of their recordings are still open: start the recorder, which closes them, and try again");
+    }
+    console.Answer(
+        Object("cameras", removed.cameras, "emaps", removed.emaps, "recordings", removed.recordings), "Removed ",
+        removed.cameras, " demo cameras, ", removed.emaps, " e-maps and ", removed.recordings, " recordings.",
+        demo::HasViewer(store) ? "\nThe account viewer is kept: lookhaven user remove viewer removes it." : "");
+}
+
 void GenerateEvents(const Console& console, const Request& request) {
     if (request.remove) {
         return RemoveEvents(console);
@@ -82,6 +104,7 @@ void AddDemo(CLI::App& program, const Console& console) {
               "Adds four cameras, two of them recorded, e-maps, and the account viewer; prompts for its password",
               SetUp);
     group.Add("footage", "Records some scenes of the last days, with alerts and POS transactions", RecordFootage);
+    group.Add("remove", "Removes what setup, footage and events added, but the account", Remove);
     group.Add("events", "Generates events without footage, or removes them", GenerateEvents)
         .Option("--count", request.count, "Number of events", Satisfies(CLI::Range(1, 100'000'000)))
         .Option("--days", request.days, "Spread them over this many days up to now (default: 30)",

@@ -95,4 +95,23 @@ CamerasAdded AddCameras(store::Store& store) {
     return added;
 }
 
+std::vector<Camera> FindCameras(store::Store& store) {
+    std::vector<Camera> found = store::Cameras(store).List();
+    std::erase_if(found, [demo = DemoCameras()](const Camera& camera) {
+        return std::ranges::none_of(demo, [&](const DemoCamera& each) {
+            return each.camera.name == camera.name && each.camera.profiles == camera.profiles;
+        });
+    });
+    return found;
+}
+
+void RemoveGroup(store::Store& store, const std::set<int>& cameras) {
+    store::Groups groups(store);
+    for (const store::CameraGroup& group : groups.List()) {
+        if (group.name == kGroup && std::ranges::includes(cameras, group.camera_ids)) {
+            groups.Remove(group.id);
+        }
+    }
+}
+
 }  // namespace lookhaven::demo

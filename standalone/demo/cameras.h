@@ -4,8 +4,11 @@
 #pragma once
 
 #include <map>
+#include <set>
 #include <string>
+#include <vector>
 
+#include "standalone/store/cameras.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::demo {
@@ -21,5 +24,11 @@ struct CamerasAdded {
 // Adds the cameras that are missing by name, records those of them that the demo records, and adds the group. Cameras
 // that exist keep their record and plan. In a store without cameras and events the default mount's limit is lowered.
 CamerasAdded AddCameras(store::Store& store);
+
+// Those that still have the demo's name and source.
+std::vector<store::Camera> FindCameras(store::Store& store);
+
+// Removes the demo's group unless it has got other cameras.
+void RemoveGroup(store::Store& store, const std::set<int>& cameras);
 
 }  // namespace lookhaven::demo

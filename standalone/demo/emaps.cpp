@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/demo/emaps.h"
 
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "standalone/base/clock.h"
@@ -19,6 +21,11 @@ using store::EmapItem;
 using store::EmapItemType;
 using store::PortType;
 
+constexpr const char* kFrontDoor = "Front door";
+constexpr const char* kBackDoor = "Loading door";
+constexpr const char* kPlantRoom = "Plant room";
+constexpr const char* kTerminal = "POS terminal";
+
 struct Ids {
     int ground = 0;
     int upper = 0;
@@ -32,12 +39,12 @@ Ids AddDevices(store::Store& store, const std::map<std::string, int>& cameras) {
     Devices devices(store);
     Ids ids;
     ids.front_door =
-        devices.Add({.kind = EmapItemType::kDoor, .name = "Front door", .camera_id = cameras.at("Entrance")});
-    ids.back_door = devices.Add({.kind = EmapItemType::kDoor, .name = "Loading door"});
+        devices.Add({.kind = EmapItemType::kDoor, .name = kFrontDoor, .camera_id = cameras.at("Entrance")});
+    ids.back_door = devices.Add({.kind = EmapItemType::kDoor, .name = kBackDoor});
     ids.io = devices.Add({.kind = EmapItemType::kIoModule,
-                          .name = "Plant room",
+                          .name = kPlantRoom,
                           .ports = {{0, {PortType::kInput, cameras.at("Parking")}}, {1, {PortType::kOutput, 0}}}});
-    ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = "POS terminal", .camera_id = cameras.at("Entrance")});
+    ids.pos = devices.Add({.kind = EmapItemType::kPos, .name = kTerminal, .camera_id = cameras.at("Entrance")});
     devices.SetCameraPorts(cameras.at("Entrance"), {1, 1});
     const std::int64_t now_s = base::WallSeconds();
     devices.Report({EmapItemType::kDoor, ids.front_door, -1, "closed", now_s});
@@ -54,11 +61,11 @@ std::vector<EmapItem> GroundFloor(const Ids& ids, const std::map<std::string, in
     return {item(EmapItemType::kCamera, cameras.at("Entrance"), "Entrance", 560, 620, 20),
             item(EmapItemType::kCamera, cameras.at("Parking"), "Parking", 980, 170, 200),
             item(EmapItemType::kCamera, cameras.at("Entrance"), "Door contact", 460, 600, 0, 0),
-            item(EmapItemType::kDoor, ids.front_door, "Front door", 420, 700),
-            item(EmapItemType::kDoor, ids.back_door, "Loading door", 740, 160),
+            item(EmapItemType::kDoor, ids.front_door, kFrontDoor, 420, 700),
+            item(EmapItemType::kDoor, ids.back_door, kBackDoor, 740, 160),
             item(EmapItemType::kIoModule, ids.io, "Smoke alarm", 190, 190, 0, 0),
             item(EmapItemType::kIoModule, ids.io, "Ventilation", 280, 190, 0, 1),
-            item(EmapItemType::kPos, ids.pos, "POS terminal", 540, 430),
+            item(EmapItemType::kPos, ids.pos, kTerminal, 540, 430),
             item(EmapItemType::kEmap, ids.upper, "Upper floor", 220, 590)};
 }
 
@@ -93,6 +100,32 @@ int AddEmaps(store::Store& store, const std::filesystem::path& home, const std::
     Place(store, ids.upper, UpperFloor(ids, cameras));
     store::Users(store).DenyItem(viewer, store::DeniableItem::kDoor, ids.back_door);
     return 2;
+}
+
+int RemoveEmaps(store::Store& store, const std::filesystem::path& home, const std::set<int>& cameras) {
+    store::Emaps emaps(store);
+    emap::Pictures pictures(store, home);
+    int removed = 0;
+    for (const store::EmapSummary& map : emaps.List()) {
+        if (const std::string picture = map.image.empty() ? "" : pictures.Read(map.image);
+            picture == kGroundFloorPlan || picture == kUpperFloorPlan) {
+            emaps.Remove(map.id);
+            ++removed;
+        }
+    }
+    Devices devices(store);
+    for (const auto& [kind, name] : {std::pair(EmapItemType::kDoor, kFrontDoor),
+                                     {EmapItemType::kDoor, kBackDoor},
+                                     {EmapItemType::kIoModule, kPlantRoom},
+                                     {EmapItemType::kPos, kTerminal}}) {
+        for (const store::Device& device : devices.List(kind)) {
+            if (device.name == name && (device.camera_id == 0 || cameras.contains(device.camera_id))) {
+                devices.Remove(kind, device.id);
+            }
+        }
+    }
+    pictures.Sweep();
+    return removed;
 }
 
 }  // namespace lookhaven::demo

@@ -5,6 +5,7 @@
 
 #include <filesystem>
 #include <map>
+#include <set>
 #include <string>
 
 #include "standalone/store/store.h"
@@ -15,5 +16,9 @@ namespace lookhaven::demo {
 // second door; returns how many maps were added. cameras: ids by name. viewer: the account's id.
 int AddEmaps(store::Store& store, const std::filesystem::path& home, const std::map<std::string, int>& cameras,
              int viewer);
+
+// Removes the maps that still show the demo's plans, and the demo's devices unless another camera watches them; returns
+// how many maps were removed. cameras: the demo's.
+int RemoveEmaps(store::Store& store, const std::filesystem::path& home, const std::set<int>& cameras);
 
 }  // namespace lookhaven::demo

@@ -2,6 +2,7 @@
 #
 # script/server: what it says when it cannot start, what it leaves behind, what it sets up.
 import contextlib
+import json
 import os
 import pathlib
 import pwd
@@ -81,9 +82,11 @@ class ServerTest(unittest.TestCase):
             self.check_refusal(server, ["libsodium-dev", "Unable to fetch", "apt-get install"], 60)
 
     def test_second_start_on_the_same_folder(self):
-        with Installation() as first:
+        with Installation(LOOKHAVEN_DEMO="no") as first:
             self.check_refusal(Installation(LOOKHAVEN_HOME=str(first.home)), [f"kill {first.server.pid}"], 5)
             self.assertTrue(first.answers())
+            self.assertNotIn("viewer", first.said())
+            self.assertEqual(json.loads(first.cli("camera", "list", "--json")), [])
 
     def test_whatever_ends_the_script_leaves_nothing_running_and_the_next_start_works(self):
         with Installation() as server:

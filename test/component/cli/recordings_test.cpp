@@ -69,6 +69,20 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
     EXPECT_EQ(store::Mounts(store).List().size(), 1U);
     EXPECT_EQ(store::Mounts(store).Find(1)->max_bytes, std::int64_t{900} << 30);
     EXPECT_EQ(store::RecordingPlans(store).Find(1).mode, store::RecordMode::kNever);
+
+    // What the owner made his own stays.
+    store::Events events(store);
+    const int growing = AddRow(events, 1, kStart, base::kReasonContinuous, true);
+    Play({{"camera set 3 --name Shed", 0, "Changed"}, {"demo remove", 69, "1 of their recordings"}});
+    events.Finish(growing, kStart + 300, 1, 1);
+    Play({{"demo remove", 0, "Removed 3 demo cameras, 2 e-maps and 9 recordings.\nThe account viewer is kept"},
+          {"camera list", 0, "Shed", "Gate"},
+          {"group list", 0, "Hof"},
+          {"door list", 0, "", "door"},
+          {"event list", 0, "no such event"},
+          {"verify", 0, "0 events with 0 frames"},
+          {"demo remove", 0, "Removed 0 demo cameras"}});
+    EXPECT_FALSE(std::filesystem::exists(home_ / "recordings/1")) << "the footage is gone";
 }
 
 TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
