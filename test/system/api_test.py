@@ -2,12 +2,13 @@
 #
 # What the web API answers to good and bad requests through the web server.
 import pathlib
+import re
 import socket
 import time
 import unittest
 from concurrent.futures import ThreadPoolExecutor
 
-from installation import LIVE, PLAYER, Installation, call, wait_until
+from installation import LIVE, PLAYER, ROOT, Installation, call, wait_until
 
 
 def play(camera, **parameters):
@@ -81,7 +82,7 @@ class ApiTest(unittest.TestCase):
 
     def test_log_ins_are_throttled_by_address(self):
         with Installation() as server:
-            form = {"account": "nobody", "password": "x"}
+            form = {"account": 'x" from "203.0.113.9": wrong account or password', "password": "x"}
             # Refused before any password is hashed, so that 40 are sent faster than the limit forgets, on any machine.
             seen = [server.request({**LOGIN, "account": "nobody"}, form=form).status for _ in range(40)]
             self.assertEqual((seen[0], seen[-1]), (400, 429), seen)
@@ -89,6 +90,11 @@ class ApiTest(unittest.TestCase):
             for query in ("", "api=VEXO%2EAuth&version=1&method=Login", "api=VEXO.Event&api=VEXO.Auth&method=Login"):
                 self.assertEqual(server.request(query, form=form).status, 429, query)
             wait_until(lambda: server.request(LOGIN, form=form).status == 401, 5, "a log-in is let through again")
+            # Whoever guesses is who is banned, whatever the account's name says.
+            rule = re.search("^failregex = (.*)", (ROOT / "packaging/fail2ban/filter.d/lookhaven.conf").read_text(), re.M)[1]
+            pattern = re.compile(rule.replace("<HOST>", "(.*?)"))
+            lines = (server.home / "log/refused-log-ins.log").read_text().splitlines()
+            self.assertEqual({pattern.search(line.split(" ", 1)[1])[1] for line in lines}, {"127.0.0.1"}, lines)
 
     def test_plain_http_is_for_this_machine_by_its_own_names(self):
         for host, status in (("localhost", 200), ("127.0.0.1:8080", 200), ("rebound.example", 421)):
