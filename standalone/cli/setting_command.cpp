@@ -5,6 +5,7 @@
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/settings_file.h"
 #include "standalone/cli/table.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/secret.h"
@@ -33,6 +34,10 @@ constexpr Column kColumns[] = {{"setting", "setting"}, {"value", "value"}, {"mea
 struct Request {
     int value = 0;
     std::string word;
+};
+
+struct CheckRequest {
+    std::string file = kSettingsFile;
 };
 
 void Show(const Console& console) {
@@ -70,11 +75,19 @@ void SetMonitorToken(const Console& console, const Request& request) {
     console.Answer(Object("token", token), is_new ? token : "Monitors on other machines are refused.");
 }
 
+void Check(const Console& console, const CheckRequest& request) {
+    CheckSettingsFile(request.file);
+    console.Answer(Object("file", request.file), "The settings in ", request.file, " are right.");
+}
+
 }  // namespace
 
 void AddSetting(CLI::App& program, const Console& console) {
     CommandGroup<> group(program, console, "setting", "Numbers that hold for the whole installation");
     group.Add("show", "Shows all settings", Show);
+    CommandGroup<CheckRequest> check(group.app(), console);
+    check.Add("check", "Checks the settings of the installed services", Check)
+        .Option("file", check.request().file, std::string("The file (default: ") + kSettingsFile + ")");
     CommandGroup<Request> set(group.app(), console, "set", "Changes a setting");
     for (const Setting& setting : kSettings) {
         set.Add(setting.name, setting.meaning,

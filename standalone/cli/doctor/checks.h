@@ -10,6 +10,7 @@
 //               must do.
 #pragma once
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -56,6 +57,9 @@ Findings CheckActiveRecorder(const base::Installation& installation);
 Findings CheckWebServer(const base::Installation& installation);
 Findings CheckCertificate(const base::Installation& installation);
 Findings CheckPairedHosts(const base::Installation& installation);
+
+// What starts the server again, as a remedy; log: where to look where that does not help.
+std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log);
 
 // The name of the user who runs this program, for a remedy.
 std::string OwnName();

@@ -46,13 +46,18 @@ bool HostAnswers(const std::string& path) {
 
 }  // namespace
 
+// An installation of the packages is run by services.
+std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log) {
+    return installation.Home() == "/var/lib/lookhaven" ? "as root: systemctl restart lookhaven.target"
+                                                       : "start the server with script/server, or read " + log.string();
+}
+
 Findings CheckHost(const base::Installation& installation) {
     const std::string socket = installation.WebApiSocket().string();
     if (HostAnswers(socket)) {
         return {};
     }
-    return {{"the web API host does not answer at " + socket,
-             "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
+    return {{"the web API host does not answer at " + socket, HowToStart(installation, installation.LogFolder())}};
 }
 
 Findings CheckRecorder(const base::Installation& installation) {
@@ -67,7 +72,7 @@ Findings CheckRecorder(const base::Installation& installation) {
     }
     return {{control::MapCommonConfig(installation) == nullptr ? "the recorder has not run since the machine started"
                                                                : "the recorder does not run",
-             "start the server with script/server, or read the logs in " + installation.LogFolder().string()}};
+             HowToStart(installation, installation.LogFolder())}};
 }
 
 // Another host's recorder may record the cameras of a store that both share.

@@ -33,10 +33,14 @@ struct Listener {
     bool has_tls = false;
 };
 
-// script/server writes the file; an installation behind another web server has none.
+// Who starts the web server puts it there; an installation behind another web server has none.
+std::filesystem::path ConfigurationOf(const base::Installation& installation) {
+    return installation.RunFolder() / "nginx.conf";
+}
+
 std::vector<Listener> ListenersOf(const base::Installation& installation) {
     std::vector<Listener> listeners;
-    std::ifstream file(installation.RunFolder() / "nginx.conf");
+    std::ifstream file(ConfigurationOf(installation));
     static const std::regex kListen(R"(^\s*listen (?:(\[::\]|[0-9.]+):)?([0-9]+)( ssl)?.*)");
     std::smatch match;
     for (std::string line; std::getline(file, line);) {
@@ -85,11 +89,15 @@ bool HasIpv6() {
 Findings CheckWebServer(const base::Installation& installation) {
     const std::vector<Listener> listeners = ListenersOf(installation);
     Findings findings;
+    // The service's own configuration goes when it ends.
+    if (std::error_code ignored;
+        listeners.empty() && std::filesystem::is_symlink(ConfigurationOf(installation), ignored)) {
+        findings.push_back({"the web server does not run", HowToStart(installation, installation.LogFolder())});
+    }
     for (const Listener& listener : listeners) {
         if (!Answers(listener)) {
-            findings.push_back(
-                {Concat("the web server does not answer at ", listener.host, " port ", listener.port),
-                 "start the server with script/server, or read " + (installation.LogFolder() / "nginx.log").string()});
+            findings.push_back({Concat("the web server does not answer at ", listener.host, " port ", listener.port),
+                                HowToStart(installation, installation.LogFolder() / "nginx.log")});
         }
     }
     if (!listeners.empty() && HasIpv6() && std::ranges::find(listeners, "::1", &Listener::host) == listeners.end()) {
@@ -109,7 +117,7 @@ Findings CheckCertificate(const base::Installation& installation) {
     }
     const std::string remedy =
         "put a valid certificate.pem and key.pem there and restart the server; a self-signed one that "
-        "script/server made is replaced when it restarts";
+        "was made here is replaced when it restarts";
     try {
         const std::int64_t end_s = remote::CertificateEnd(base::ReadFile(path));
         const std::int64_t left_s = end_s - base::WallSeconds();

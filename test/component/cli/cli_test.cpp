@@ -2,10 +2,12 @@
 //
 // The operator's command line: what each line answers, how it fails, and that no password ever shows.
 #include <fstream>
+#include <tuple>
 
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/base/file.h"
 #include "standalone/base/installation.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/users.h"
@@ -89,6 +91,25 @@ TEST_F(CliTest, SetUpIsRepeatableAndKeepsWhatIsThere) {
                   std::filesystem::perms::none)
             << name;
     }
+}
+
+TEST_F(CliTest, AFileOfSettingsIsRightOrSaysInWhichLineItIsNot) {
+    const auto file = folder_ / "lookhaven.conf";
+    const std::tuple<const char*, int, const char*> rows[] = {
+        {"", 0, "are right"},
+        {"# a comment\n\nLOOKHAVEN_PORT=8081\nLOOKHAVEN_TLS_PORT = \"8444\"\n", 0, "are right"},
+        {"# a comment\nLOOKHAVEN_PROT=8081\n", 78,
+         "line 2: there is no setting LOOKHAVEN_PROT; did you mean LOOKHAVEN_PORT?"},
+        {"LOOKHAVEN_TLSPORT=1\n", 78, "did you mean LOOKHAVEN_TLS_PORT?"},
+        {"LOOKHAVEN_PORT=443\n", 78, "line 1: LOOKHAVEN_PORT must be a number from 1024"},
+        {"LOOKHAVEN_PORT\n", 78, "must be a number"},
+        {"LOOKHAVEN_PORT=8443\n", 78, "are both 8443"},
+    };
+    for (const auto& [text, code, has] : rows) {
+        base::WriteFileAtomically(file, text);
+        Play({{"setting check " + file.string(), code, has}});
+    }
+    Play({{"setting check " + (folder_ / "none").string(), 0, "are right"}});
 }
 
 TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
