@@ -2,8 +2,9 @@
 //
 // Goes from the log-in to the screens, from screen to screen as the address says, and back to the log-in.
 
-import { Server, ServerError, type Account } from "../wire/server";
+import { Server, type Account } from "../wire/server";
 import { EventsScreen } from "./screens/events_screen";
+import { keepTrying } from "./screens/keep_trying";
 import { loginScreen } from "./screens/login_screen";
 import { MapsScreen } from "./screens/maps_screen";
 import { followRoute, openScreen } from "./screens/route";
@@ -28,13 +29,16 @@ export class App {
   async start(): Promise<void> {
     this.#root.replaceChildren(element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" }));
     followRoute(() => this.#followRoute());
-    try {
-      const account = await this.#server.status();
-      if (account) this.#showScreens(account);
-      else this.#showLogin("");
-    } catch (error) {
-      this.#showLogin(error instanceof ServerError ? error.message : String(error));
-    }
+    const forever = new AbortController().signal;
+    const account = await keepTrying(() => this.#server.status(), (sentence) => this.#showWaiting(sentence), forever);
+    if (account) this.#showScreens(account);
+    else this.#showLogin("");
+  }
+
+  /** Nobody can log in, nor need to, while the server does not say whether there is a session. */
+  #showWaiting(sentence: string): void {
+    const wait = element("div", { class: "waiting" }, element("div", { class: "spinner" }), element("p", { role: "alert" }, sentence));
+    this.#root.replaceChildren(element("main", { class: "login" }, wait));
   }
 
   /** `hint` says why the user is here again, if there is a reason. */

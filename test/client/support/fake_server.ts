@@ -29,9 +29,13 @@ export class FakeServer {
   readonly streams: string[] = [];
   /** Data of further answers, by method. */
   answers: Record<string, unknown> = {};
+  /** The content of every map. */
+  emap: unknown = null;
   polls = 0;
   mostPollsAtOnce = 0;
   hasSession = false;
+  /** Takes requests of the API and answers none. */
+  isAway = false;
   jpeg: Buffer = Buffer.alloc(0);
   /** What cameras of another video type send, 25 pictures a second, over and over, with a tone beside each `isLoud`. */
   readonly muxed = new Map<number, { type: string; pictures: Buffer[]; isLoud(picture: number): boolean }>();
@@ -57,12 +61,14 @@ export class FakeServer {
   #answer(request: IncomingMessage, answer: ServerResponse): void {
     const { pathname, searchParams } = new URL(request.url ?? "", "http://localhost");
     if (pathname !== "/webapi") return this.#file(pathname === "/" ? "/index.html" : pathname, answer);
+    if (this.isAway) return void request.socket.destroy();
     const method = searchParams.get("method");
     if (method === "Login") this.hasSession = true;
     if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
     if (method === "Logout") this.hasSession = false;
     if (method! in this.answers) return json(answer, 200, { success: true, data: this.answers[method!] });
     if (method === "Get" && searchParams.get("api") === "VEXO.Picture") return this.#snapshot(answer);
+    if (searchParams.get("itemType") === "1" && this.emap) return json(answer, 200, { success: true, data: this.emap });
     if (method === "Play") return this.#play(searchParams, answer);
     if (/VEXO\.(Playback|Event|Catalog|Picture)|Player$/.test(searchParams.get("api")!) && method !== "LoadCamera") {
       return void this.#recordings(searchParams, request, answer);

@@ -49,6 +49,7 @@ export class MapEditor {
     this.#view = new MapView<MapItem>({ choose: (view) => this.#select(view), point: () => undefined });
     this.#form = new MapItemForm(
       (item) => this.#change(item),
+      () => this.#showButtons(),
       () => this.#remove(),
     );
     this.#conflict = conflictBar(
@@ -68,7 +69,7 @@ export class MapEditor {
   }
 
   get isChanged(): boolean {
-    return this.#history.isChanged;
+    return this.#history.isChanged || this.#form.isTyped;
   }
 
   close(): void {
@@ -80,6 +81,7 @@ export class MapEditor {
 
   /** Where someone else has changed the map, asks the user, unless `overwrite`. */
   save(overwrite = false): Promise<void> {
+    this.#form.commit();
     this.#saving = this.#saving.then(() => (overwrite || this.isChanged ? this.#saveNow(overwrite) : undefined));
     return this.#saving;
   }

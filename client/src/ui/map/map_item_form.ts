@@ -23,8 +23,11 @@ export class MapItemForm {
   readonly #textPos = element("select", { class: "input" }, ...kTextPositions.map((name, at) => element("option", { value: String(at) }, name)));
   readonly #onChange: (item: MapItem) => void;
   #item: MapItem | null = null;
+  /** What the fields held when the item was shown. */
+  #shown = "";
 
-  constructor(onChange: (item: MapItem) => void, onRemove: () => void) {
+  /** `onChange` is called with what a field holds when it is left, `onType` at each change before. */
+  constructor(onChange: (item: MapItem) => void, onType: () => void, onRemove: () => void) {
     this.#onChange = onChange;
     const number = (max: string) => element("input", { class: "input", type: "number", min: "0", max, step: "1", required: true });
     this.#numbers = { x: number("100000"), y: number("100000"), direction: number("359") };
@@ -47,9 +50,20 @@ export class MapItemForm {
         iconButton("remove", "Remove from the map", onRemove, "Del"),
       ),
     );
-    for (const field of [this.#name, this.#textPos, ...Object.values(this.#numbers)]) {
+    for (const field of this.#fields) {
       field.addEventListener("change", () => this.#read());
+      field.addEventListener("input", onType);
     }
+  }
+
+  /** Whether a field holds what `onChange` was not called with yet, or cannot be since it is not valid. */
+  get isTyped(): boolean {
+    return this.#item !== null && this.#values() !== this.#shown;
+  }
+
+  /** Calls `onChange` with what is in the fields, as if they were left. */
+  commit(): void {
+    if (this.isTyped) this.#read();
   }
 
   show(item: MapItem | null): void {
@@ -60,6 +74,15 @@ export class MapItemForm {
     this.#name.value = item.name;
     this.#textPos.value = String(item.textPos);
     for (const name of ["x", "y", "direction"] as const) this.#numbers[name].value = String(item[name]);
+    this.#shown = this.#values();
+  }
+
+  get #fields(): (HTMLInputElement | HTMLSelectElement)[] {
+    return [this.#name, this.#textPos, ...Object.values(this.#numbers)];
+  }
+
+  #values(): string {
+    return JSON.stringify(this.#fields.map(({ value }) => value));
   }
 
   #read(): void {

@@ -22,6 +22,7 @@ import { element, setText } from "../widgets/dom";
 import { toggleFullScreen } from "../widgets/full_screen";
 import { notify } from "../widgets/notice";
 import { spanInWords } from "../widgets/text";
+import { keepTrying } from "./keep_trying";
 import { openFootage, recordFootage } from "./route";
 import { Screen, type Session } from "./screen";
 
@@ -140,13 +141,14 @@ export class EventsScreen extends Screen {
   }
 
   async #load(): Promise<void> {
-    try {
-      this.#cameras = (await this.server.cameras()).camera ?? [];
-      this.#error = "";
-    } catch (error) {
-      this.#error = error instanceof ServerError ? error.message : String(error);
-      return this.#refresh();
-    }
+    const failed = (sentence: string) => {
+      this.#error = sentence;
+      this.#refresh();
+    };
+    const list = await keepTrying(() => this.server.cameras(), failed, this.closed);
+    if (!list) return;
+    this.#cameras = list.camera ?? [];
+    this.#error = "";
     this.#filter.setCameras(this.#cameras);
     this.#filter.setGroups([]);
     // A host without a catalogue has no groups.
@@ -223,6 +225,8 @@ export class EventsScreen extends Screen {
     const { startMs, endMs } = this.#timeline.scale;
     if (!this.#timeline.showsEvents) this.#days.load(this.#chosenCameras(), startMs, endMs);
     else void this.#cache.load(this.#chosenCameras(), startMs / 1000, endMs / 1000, true);
+    // Asks again for days that the server did not answer for.
+    this.#calendar.refresh();
     this.#showFootage();
   }
 

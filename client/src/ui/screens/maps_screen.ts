@@ -3,7 +3,7 @@
 // One e-map at a time: its picture with what is placed on it, its editor, and over it a camera that was opened there.
 
 import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem, type ViewerMap } from "../../wire/emaps";
-import { asServerError, type Camera } from "../../wire/server";
+import { asServerError, type Camera, type ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { MapCard } from "../map/map_card";
 import { MapEditor } from "../map/map_editor";
@@ -12,11 +12,14 @@ import { MapView } from "../map/map_view";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { notify } from "../widgets/notice";
+import { keepTrying } from "./keep_trying";
 import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
 import { Screen, type Session } from "./screen";
 
 const kRefreshMs = 500;
 const kStatesIntervalMs = 3_000;
+/** The host's own number for a map that does not exist or is denied; a web server whose host is away has none. */
+const kNoSuchMap = 502;
 
 export class MapsScreen extends Screen {
   readonly #emaps = new Emaps(this.server);
@@ -33,6 +36,7 @@ export class MapsScreen extends Screen {
   #states: DeviceState[] = [];
   #map: { id: number; content: ViewerMap } | null = null;
   #editor: MapEditor | null = null;
+  #loading = new AbortController();
 
   constructor(session: Session) {
     super("maps", session);
@@ -62,6 +66,7 @@ export class MapsScreen extends Screen {
 
   override close(): void {
     super.close();
+    this.#loading.abort();
     this.#card.hide();
     this.#editor?.close();
     this.#overlay.close();
@@ -74,8 +79,9 @@ export class MapsScreen extends Screen {
   }
 
   followRoute(): boolean {
-    const open = openMap();
-    if (!open || this.#maps.length === 0) return true;
+    if (this.#maps.length === 0) return true;
+    if (openMap() === null) replaceRoute(this.#map?.id ?? this.#maps[0]!.id);
+    const open = openMap()!;
     if (this.#map?.id === open.map) this.#showCamera(open.camera);
     else if (this.#leaveEditor()) void this.#goTo(open.map);
     else return false;
@@ -92,21 +98,16 @@ export class MapsScreen extends Screen {
   }
 
   async #start(): Promise<void> {
-    try {
-      const [maps, cameras] = await Promise.all([this.#emaps.list(), this.server.cameras()]);
-      if (this.closed.aborted) return;
-      this.#maps = maps;
-      this.#cameras = cameras.camera ?? [];
-      this.#names.replaceChildren(...maps.map(({ id, name }) => element("option", { value: String(id) }, name)));
-      this.#names.hidden = this.#tools.hidden = maps.length === 0;
-      if (maps.length === 0) {
-        return this.#showMessage("There are no maps yet. A manager adds one with lookhaven emap add.");
-      }
-      if (openMap() === null) replaceRoute(maps[0]!.id);
-      this.followRoute();
-    } catch (error) {
-      this.#showMessage(asServerError(error).message);
-    }
+    const ask = () => Promise.all([this.#emaps.list(), this.server.cameras()]);
+    const answer = await keepTrying(ask, (sentence) => this.#showMessage(sentence), this.closed);
+    if (!answer) return;
+    const [maps, cameras] = answer;
+    this.#maps = maps;
+    this.#cameras = cameras.camera ?? [];
+    this.#names.replaceChildren(...maps.map(({ id, name }) => element("option", { value: String(id) }, name)));
+    this.#names.hidden = this.#tools.hidden = maps.length === 0;
+    this.#showMessage(maps.length > 0 ? "" : "There are no maps yet. A manager adds one with lookhaven emap add.");
+    this.followRoute();
   }
 
   async #goTo(id: number): Promise<void> {
@@ -116,29 +117,34 @@ export class MapsScreen extends Screen {
   }
 
   async #load(id: number): Promise<void> {
+    this.#loading.abort();
+    const { signal } = (this.#loading = new AbortController());
     this.#card.hide();
     this.progress.hidden = false;
     this.#names.value = String(id);
-    try {
-      const content = await this.#emaps.open(id);
-      if (this.closed.aborted || openMap()?.map !== id) return;
-      this.#map = { id, content };
-      this.#states = [];
-      this.#showMessage("");
-      this.#view.showItems(content.items, content);
-      if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
-      void this.#loadStates();
-    } catch (error) {
-      const { status, message } = asServerError(error);
-      this.#map = null;
-      this.#view.showItems([], { hideNames: false, smallItems: false });
-      void this.#view.showPicture(null);
-      this.#showMessage(
-        status === 502 ? "This map does not exist, or you do not have permission to view it." : message,
-      );
-    } finally {
-      this.progress.hidden = true;
-    }
+    const ask = () =>
+      this.#emaps.open(id).catch((error: ServerError) => {
+        if (error.code === kNoSuchMap) return null;
+        throw error;
+      });
+    const content = await keepTrying(ask, (sentence) => this.#showNothing(sentence), signal);
+    if (content === undefined || openMap()?.map !== id) return;
+    this.progress.hidden = true;
+    if (!content) return this.#showNothing("This map does not exist, or you do not have permission to view it.");
+    this.#map = { id, content };
+    this.#states = [];
+    this.#showMessage("");
+    this.#view.showItems(content.items, content);
+    if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
+    void this.#loadStates();
+  }
+
+  /** In place of a map. */
+  #showNothing(sentence: string): void {
+    this.#map = null;
+    this.#view.showItems([], { hideNames: false, smallItems: false });
+    void this.#view.showPicture(null);
+    this.#showMessage(sentence);
   }
 
   async #loadStates(): Promise<void> {
