@@ -18,6 +18,7 @@ import { Transport } from "../events/transport";
 import { spanText } from "../timeline/time_scale";
 import { Timeline } from "../timeline/timeline";
 import { iconButton } from "../widgets/button";
+import { Choice } from "../widgets/choice";
 import { element, setText } from "../widgets/dom";
 import { toggleFullScreen } from "../widgets/full_screen";
 import { notify } from "../widgets/notice";
@@ -37,6 +38,7 @@ const kZoomStep = 2;
 const kSettleMs = 150;
 
 export class EventsScreen extends Screen {
+const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", filter: "Filter" };
   readonly #recordings = new Recordings(this.server);
   readonly #cache = new FootageCache(this.#recordings, () => this.#showFootage());
   readonly #days = new RecordedDays(this.#recordings, () => this.#showDays());
@@ -60,6 +62,9 @@ export class EventsScreen extends Screen {
   readonly #status = element("p", { class: "bar-status" });
   #cameras: Camera[] = [];
   /** What the address asks for while it is being looked up. */
+  readonly #body = element("div", { class: "events-body" });
+  /** What is shown below the player where there is no room for all of it. */
+  readonly #panels = new Choice("Show", kPanels, "list", (panel) => (this.#body.dataset["panel"] = panel));
   #opening = "";
   /** Why there is no list of cameras; empty when there is. */
   #error = "";
@@ -134,10 +139,18 @@ export class EventsScreen extends Screen {
       iconButton("zoomIn", "Show less time", () => this.#timeline.zoom(1 / kZoomStep), "+"),
     );
     this.#transport.root.append(zoom);
-    const side = element("aside", { class: "side" }, this.#calendar.root, this.#filter.root, this.#list.root);
-    const main = element("div", { class: "events-main" }, this.#stage.root, this.#transport.root, this.#timeline.root);
+    const side = element("div", { class: "side" }, this.#calendar.root, this.#filter.root, this.#list.root);
+    const main = element(
+      "div",
+      { class: "events-main" },
+      this.#stage.root,
+      this.#transport.root,
+      this.#panels.root,
+      this.#timeline.root,
+    );
+    this.#body.append(main, side);
     this.addToBar(this.#status);
-    this.front.append(element("div", { class: "events-body" }, main, side));
+    this.front.append(this.#body);
   }
 
   async #load(): Promise<void> {
@@ -281,6 +294,7 @@ export class EventsScreen extends Screen {
   }
 
   #togglePlaying(): void {
+    this.#calendar.mark(footage && this.#playback.playheadMs);
     if (this.#playback.isPlaying) this.#playback.pause();
     else this.#playback.play();
   }

@@ -181,8 +181,10 @@ export class Timeline {
     const widthPx = this.#drawn.clientWidth;
     if (widthPx === 0) return;
     this.root.style.setProperty("--lanes", String(Math.max(1, this.#lanes.length)));
-    // The newest stays in place: the right end does.
-    this.#scale = new TimeScale(this.#scale.endMs - widthPx * this.#scale.msPerPx, this.#scale.msPerPx, widthPx);
+    const { startMs, endMs, msPerPx } = this.#scale;
+    // The newest stays in place: the right end does. What was shown before there was a width stays whole.
+    const isFirst = this.#colours === null;
+    this.#scale = isFirst ? TimeScale.of(startMs, endMs, widthPx) : new TimeScale(endMs - widthPx * msPerPx, msPerPx, widthPx);
     this.#colours = coloursOf(this.root);
     this.#actions.moved();
     this.redraw();
