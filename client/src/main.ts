@@ -16,7 +16,7 @@
 //     events/     the stage of players with its transport controls; calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     widgets/    what all of these use: elements, buttons, icons, texts, notices, panning and zooming
+//     widgets/    what all of these use: elements, buttons, icons, texts, titles, notices, keys, panning and zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
 //
 // ui may use live, playback and wire; live and playback use wire. Nothing here writes markup from text (see dom), and the page

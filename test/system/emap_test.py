@@ -126,7 +126,7 @@ class EmapTest(unittest.TestCase):
             self.assertEqual([terminal["x"] + 1, terminal["y"]], seen["saved"])
 
             seen = visit.see("harmless")
-            self.assertEqual((seen["title"], seen["complaints"]), ("Lookhaven", []))
+            self.assertEqual((seen["title"], seen["complaints"]), ("Harmful · Lookhaven", []))
 
 
 if __name__ == "__main__":

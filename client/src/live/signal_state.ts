@@ -12,31 +12,22 @@ export type SignalState =
   | { kind: "idle" }
   | { kind: "connecting" }
   | { kind: "live" }
-  /** Since the capture of the last picture, or since watching began when there was none; unix milliseconds. */
-  | { kind: "lost"; sinceMs: number; reason: string };
-
-export interface Clock {
-  /** Milliseconds that never jump. */
-  steadyMs(): number;
-  /** Unix milliseconds. */
-  wallMs(): number;
-}
-
-export const kBrowserClock: Clock = { steadyMs: () => performance.now(), wallMs: () => Date.now() };
+  /** Since the capture of the last picture that was seen, unix milliseconds; null when there was none. */
+  | { kind: "lost"; sinceMs: number | null; reason: string };
 
 export class SignalMonitor {
-  readonly #clock: Clock;
+  readonly #steadyMs: () => number;
   #watching = false;
   #connected = false;
   /** When the newest picture was captured, or watching began, on the steady clock. */
   #freshAtMs = 0;
-  #sinceMs = 0;
   #capturedMs = Number.NaN;
   #lostAfterMs = 0;
   #reason = "";
 
-  constructor(clock: Clock = kBrowserClock) {
-    this.#clock = clock;
+  /** `steadyMs` gives milliseconds that never jump. */
+  constructor(steadyMs = () => performance.now()) {
+    this.#steadyMs = steadyMs;
   }
 
   /** Starts watching, or continues with another limit. */
@@ -47,15 +38,14 @@ export class SignalMonitor {
     this.#connected = false;
     this.#reason = "";
     this.#capturedMs = Number.NaN;
-    this.#freshAtMs = this.#clock.steadyMs();
-    this.#sinceMs = this.#clock.wallMs();
+    this.#freshAtMs = this.#steadyMs();
   }
 
   /** A picture has come; one with the capture time of the last is the same picture sent again. */
   picture(capturedMs: number, ageMs: number): void {
     if (capturedMs === this.#capturedMs) return;
-    this.#capturedMs = this.#sinceMs = capturedMs;
-    this.#freshAtMs = this.#clock.steadyMs() - ageMs;
+    this.#capturedMs = capturedMs;
+    this.#freshAtMs = this.#steadyMs() - ageMs;
     this.#connected = true;
     this.#reason = "";
   }
@@ -73,8 +63,8 @@ export class SignalMonitor {
 
   state(): SignalState {
     if (!this.#watching) return { kind: "idle" };
-    if (this.#clock.steadyMs() - this.#freshAtMs >= this.#lostAfterMs) {
-      return { kind: "lost", sinceMs: this.#sinceMs, reason: this.#reason };
+    if (this.#steadyMs() - this.#freshAtMs >= this.#lostAfterMs) {
+      return { kind: "lost", sinceMs: Number.isNaN(this.#capturedMs) ? null : this.#capturedMs, reason: this.#reason };
     }
     return { kind: this.#connected ? "live" : "connecting" };
   }

@@ -10,8 +10,10 @@ import { MapsScreen } from "./screens/maps_screen";
 import { followRoute, openScreen } from "./screens/route";
 import type { Screen } from "./screens/screen";
 import { WallScreen } from "./screens/wall_screen";
+import { AbsentCameras } from "./wall/absent_cameras";
 import { element } from "./widgets/dom";
 import { hideNotice } from "./widgets/notice";
+import { titleScreen } from "./widgets/title";
 
 const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen };
 
@@ -19,6 +21,8 @@ export class App {
   readonly #root: HTMLElement;
   readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
   #account: Account | null = null;
+  /** Of the account that was the last to log in, in whose next session they are still absent. */
+  #absent = { userId: 0, cameras: new AbsentCameras() };
   /** Null at the log-in. */
   #screen: Screen | null = null;
 
@@ -48,12 +52,15 @@ export class App {
     this.#screen?.close();
     this.#screen = this.#account = null;
     hideNotice();
+    titleScreen("Log in");
     this.#root.replaceChildren(loginScreen(this.#server, hint, (account) => this.#showScreens(account)));
     this.#root.querySelector("input")?.focus();
   }
 
   #showScreens(account: Account): void {
     this.#account = account;
+    const userId = account.user_id;
+    if (this.#absent.userId !== userId) this.#absent = { userId, cameras: new AbsentCameras() };
     this.#followRoute();
   }
 
@@ -64,9 +71,15 @@ export class App {
     if (this.#screen?.name === name) return this.#screen.followRoute();
     if (this.#screen && !this.#screen.canLeave()) return false;
     this.#screen?.close();
-    const session = { server: this.#server, account: this.#account, onLogOut: () => this.#showLogin("") };
+    const session = {
+      server: this.#server,
+      account: this.#account,
+      absentCameras: this.#absent.cameras,
+      onLogOut: () => this.#showLogin(""),
+    };
     this.#screen = new kScreens[name](session);
     this.#root.replaceChildren(this.#screen.root);
+    this.#screen.focus();
     return true;
   }
 }

@@ -37,6 +37,8 @@ export class FakeServer {
   /** Takes requests of the API and answers none. */
   isAway = false;
   jpeg: Buffer = Buffer.alloc(0);
+  /** Of cameras that send another picture than that. */
+  readonly pictures = new Map<number, Buffer>();
   /** What cameras of another video type send, 25 pictures a second, over and over, with a tone beside each `isLoud`. */
   readonly muxed = new Map<number, { type: string; pictures: Buffer[]; isLoud(picture: number): boolean }>();
   readonly archive = new FakeArchive();
@@ -119,7 +121,7 @@ export class FakeServer {
         answer.write(part(`Content-Type: audio/PCMU\r\n${at}`, sound));
       }
       if (muxed) return;
-      answer.write(part(`X-Capture-Time: ${Date.now() / 1000}\r\nX-Age-Ms: 1\r\n`, this.jpeg));
+      answer.write(part(`X-Capture-Time: ${Date.now() / 1000}\r\nX-Age-Ms: 1\r\n`, this.pictures.get(id) ?? this.jpeg));
     }, kFrameMs);
     answer.on("close", () => {
       clearInterval(timer);

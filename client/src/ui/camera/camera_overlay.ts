@@ -3,7 +3,8 @@
 // What covers a screen that shows cameras: the large view of one of them, and the dialog with a snapshot.
 
 import type { Camera, Server } from "../../wire/server";
-import { toggleFullScreen } from "../widgets/full_screen";
+import type { KeyList } from "../widgets/keys_dialog";
+import { titleCover } from "../widgets/title";
 import { LargeView } from "./large_view";
 import type { LivePicture } from "./live_picture";
 import { SnapshotDialog } from "./snapshot_dialog";
@@ -44,12 +45,19 @@ export class CameraOverlay {
     this.#large?.close();
     this.#large = null;
     this.#front.hidden = camera !== null;
+    titleCover(camera?.name ?? null);
     if (!camera) return;
     const { back, step } = this.#actions;
-    const common = { back, snapshot: () => this.takeSnapshot(camera), fullScreen: toggleFullScreen };
+    const common = { back, snapshot: () => this.takeSnapshot(camera) };
     this.#large = new LargeView(camera, this.#server, step ? { ...common, step } : common, still);
     this.#root.prepend(this.#large.root);
     this.#large.focus();
+  }
+
+  /** Of the large view. */
+  get keys(): KeyList {
+    const step: KeyList = this.#actions.step ? [["Left Right", "The camera before or after"]] : [];
+    return [["Esc", "Back"], ...step, ["S", "Snapshot"], ["M", "Sound on or off"], ["F", "Full screen"]];
   }
 
   takeSnapshot(camera: Camera): void {

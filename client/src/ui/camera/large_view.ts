@@ -9,6 +9,7 @@ import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
+import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon } from "../widgets/icons";
 import { notify } from "../widgets/notice";
 import { signalText } from "../widgets/text";
@@ -19,7 +20,6 @@ export interface LargeViewActions {
   /** Goes on to the next camera (1) or the previous one (-1); absent where there is no order. */
   step?(by: 1 | -1): void;
   snapshot(): void;
-  fullScreen(): void;
 }
 
 export class LargeView {
@@ -38,7 +38,7 @@ export class LargeView {
   readonly #soundLabel = element("span");
   readonly #state = element("span", { class: "large-state" });
   readonly #description = element("span", { class: "large-description" });
-  readonly #back: HTMLButtonElement;
+  readonly #name: HTMLElement;
   readonly #onVisibility = () => this.#playIfVisible();
 
   /** `still` is what the wall shows of this camera, as a first picture until the large one comes. */
@@ -59,7 +59,7 @@ export class LargeView {
       true,
     );
     if (still?.hasPicture) this.#picture.showStill(still.canvas);
-    this.#back = iconButton("back", "Back to all cameras", () => actions.back(), "Esc");
+    this.#name = element("h1", { class: "large-name", tabindex: "-1", title: camera.name }, camera.name);
     this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundLabel);
     this.#soundButton.addEventListener("click", () => this.toggleSound());
     this.root = element("section", { class: "large", "aria-label": camera.name }, this.#bar(), this.#picture.root);
@@ -69,7 +69,7 @@ export class LargeView {
   }
 
   focus(): void {
-    this.#back.focus({ preventScroll: true });
+    this.#name.focus({ preventScroll: true });
   }
 
   /** Brings the screen up to date with the clock. */
@@ -103,7 +103,7 @@ export class LargeView {
         this.#actions.snapshot();
         return true;
       case "f":
-        this.#actions.fullScreen();
+        toggleFullScreen();
         return true;
       case "m":
         this.toggleSound();
@@ -129,14 +129,14 @@ export class LargeView {
       this.#soundButton,
       ...(this.#actions.step ? stepButtons : []),
       iconButton("snapshot", "Snapshot", () => this.#actions.snapshot(), "S"),
-      iconButton("fullScreen", "Full screen", () => this.#actions.fullScreen(), "F"),
+      fullScreenButton(),
     ];
     return element(
       "header",
       { class: "bar" },
-      this.#back,
+      iconButton("back", "Back to all cameras", () => this.#actions.back(), "Esc"),
       element("span", { class: "dot" }),
-      element("h1", { class: "large-name" }, this.camera.name),
+      this.#name,
       this.#state,
       this.#description,
       element("div", { class: "large-buttons" }, ...buttons),
@@ -152,7 +152,8 @@ export class LargeView {
     const state = this.#picture.state();
     this.root.dataset["state"] = state.kind;
     const pollIntervalMs = this.#picture.feed.source?.pollIntervalMs;
-    setText(this.#state, state.kind === "unavailable" ? "not available" : signalText(state, pollIntervalMs));
+    const isThere = state.kind !== "unavailable" && state.kind !== "absent";
+    setText(this.#state, isThere ? signalText(state, pollIntervalMs) : "not available");
     setText(this.#description, this.#picture.description());
     if (this.#source.unplayable && this.#audio.isOn) this.#audio.switchOff();
     this.#showSound();

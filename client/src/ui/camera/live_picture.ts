@@ -11,8 +11,11 @@ import { icon } from "../widgets/icons";
 import { signalText } from "../widgets/text";
 import { unplayableHint } from "./unplayable_hint";
 
-/** Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. */
-export type PictureState = SignalState | { kind: "unavailable"; reason: string };
+/**
+ * Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. Absent: the
+ * server does not list the camera any more.
+ */
+export type PictureState = SignalState | { kind: "unavailable"; reason: string } | { kind: "absent"; reason: string };
 
 /** An answer of the server that will not change by asking again. */
 const kNoSuchApi = 404;
@@ -25,6 +28,8 @@ export class LivePicture {
   readonly #signalLoss: () => SignalLoss | null;
   readonly #changed: () => void;
   readonly #canLink: boolean;
+  /** Why the camera is absent; empty for one that is there. */
+  absence = "";
   readonly #sentence = element("p", { class: "message-sentence" });
   readonly #reason = element("p", { class: "message-reason" });
   readonly #hint = element("p", { class: "hint", role: "note" });
@@ -70,6 +75,7 @@ export class LivePicture {
   }
 
   state(): PictureState {
+    if (this.absence) return { kind: "absent", reason: this.absence };
     const state = this.feed.state();
     const unplayable = this.#unplayable();
     const isShown = state.kind === "live" || state.kind === "idle";
@@ -106,11 +112,12 @@ export class LivePicture {
   /** Brings the screen up to date with the clock. */
   refresh(): void {
     const state = this.state();
-    const sentence = state.kind === "unavailable" ? state.reason : signalText(state);
+    const isThere = state.kind !== "unavailable" && state.kind !== "absent";
+    const sentence = isThere ? signalText(state) : state.reason;
     setText(this.#sentence, sentence.charAt(0).toUpperCase() + sentence.slice(1));
     const noStills = "The server has no still pictures of this camera.";
     setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
-    this.#showHint(state.kind === "unavailable" ? null : this.#unplayable());
+    this.#showHint(isThere ? this.#unplayable() : null);
     const shown = state.kind === "lost" ? `${state.kind} ${state.reason}` : state.kind;
     if (shown !== this.#shown) {
       this.#shown = shown;

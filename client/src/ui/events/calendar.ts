@@ -18,9 +18,12 @@ export class Calendar {
   readonly #cameras: () => readonly number[];
   readonly #title = element("h2", { "aria-live": "polite" });
   readonly #cells: HTMLButtonElement[] = [];
+  readonly #next = iconButton("next", "Next month", () => this.#turn(1));
   readonly #body = element("div", { class: "calendar-days", role: "group" });
   #monthMs = monthOf(Date.now());
   #selectedMs = midnight(Date.now());
+  /** Of what is playing; null while nothing is. */
+  #playingMs: number | null = null;
 
   /** Days of any of `cameras`. `onPick` gets a day's midnight. */
   constructor(days: RecordedDays, cameras: () => readonly number[], onPick: (dayMs: number) => void) {
@@ -38,7 +41,7 @@ export class Calendar {
       { class: "calendar-head" },
       iconButton("previous", "Previous month", () => this.#turn(-1)),
       this.#title,
-      iconButton("next", "Next month", () => this.#turn(1)),
+      this.#next,
     );
     this.root = element("section", { class: "calendar", "aria-label": "Days with recordings" }, head, this.#body);
   }
@@ -52,6 +55,15 @@ export class Calendar {
     this.refresh();
   }
 
+  /** Marks the day of what is playing, and shows its month when that is another day than before. */
+  mark(playingMs: number | null): void {
+    const day = playingMs === null ? null : midnight(playingMs);
+    if (day === this.#playingMs) return;
+    this.#playingMs = day;
+    if (day !== null) this.#monthMs = monthOf(day);
+    this.refresh();
+  }
+
   refresh(): void {
     const first = new Date(this.#monthMs);
     const start = midnight(this.#monthMs, -((first.getDay() + 6) % 7));
@@ -59,6 +71,7 @@ export class Calendar {
     this.#days.load(cameras, start, midnight(start, kCells));
     setText(this.#title, monthName(this.#monthMs));
     const today = midnight(Date.now());
+    this.#next.disabled = this.#monthMs >= monthOf(today);
     this.#cells.forEach((cell, index) => {
       const day = midnight(start, index);
       const has = cameras.some((camera) => this.#days.has(camera, day) === true);
@@ -68,9 +81,11 @@ export class Calendar {
       cell.classList.toggle("other-month", monthOf(day) !== this.#monthMs);
       cell.classList.toggle("today", day === today);
       cell.disabled = day > today;
+      const isPlaying = day === this.#playingMs;
+      cell.classList.toggle("playing", isPlaying);
       cell.tabIndex = day === this.#selectedMs ? 0 : -1;
       cell.setAttribute("aria-pressed", String(day === this.#selectedMs));
-      cell.setAttribute("aria-label", `${shortDate(day)}${has ? ", recordings" : ""}`);
+      cell.setAttribute("aria-label", `${shortDate(day)}${has ? ", recordings" : ""}${isPlaying ? ", playing" : ""}`);
     });
     // One day can always be reached with Tab.
     if (!this.#cells.some((cell) => cell.tabIndex === 0 && !cell.disabled)) {

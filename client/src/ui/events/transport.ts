@@ -34,8 +34,8 @@ export class Transport {
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
   readonly #time = element("time", { class: "transport-time" });
   readonly #frame = element("span", { class: "transport-frame" });
-  readonly #growing = element("span", { class: "transport-growing", hidden: true }, "recording");
-  readonly #download = element("a", { class: "icon-button", "aria-label": "Download this recording", title: "Download this recording" });
+  readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
+  readonly #download = element("a", { class: "icon-button", role: "link", "aria-label": "Download this recording", title: "Download this recording" });
 
   constructor(
     playback: SyncPlayback,

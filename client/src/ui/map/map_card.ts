@@ -10,7 +10,7 @@ import { clockTime, shortDate } from "../widgets/text";
 import { kindName, type MapItemView } from "./map_item";
 
 export class MapCard {
-  readonly root = element("aside", { class: "map-card", hidden: true });
+  readonly root = element("div", { class: "map-card", hidden: true });
   readonly #server: Server;
   readonly #title = element("p", { class: "map-card-title" });
   readonly #text = element("p", { class: "quiet" });
@@ -39,7 +39,8 @@ export class MapCard {
     this.#shown = view;
     setText(this.#title, view.item.name || kindName(view.item));
     const since = sinceS > 0 ? ` since ${shortDate(sinceS * 1000)} ${clockTime(sinceS * 1000)}` : "";
-    const state = view.item.kind === "door" || view.item.kind === "io" ? view.state || "state unknown" : "";
+    const reports = view.item.kind === "door" || view.item.kind === "io";
+    const state = view.state || (reports ? "state unknown" : "");
     setText(this.#text, state ? `${kindName(view.item)}, ${state}${since}` : kindName(view.item));
     this.#canvas.hidden = true;
     this.#open.hidden = open === null;

@@ -6,6 +6,7 @@ import type { EditedMap, Emaps, MapItem, Placeable } from "../../wire/emaps";
 import { asServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element } from "../widgets/dom";
+import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { conflictBar } from "./conflict_bar";
 import { EditHistory } from "./edit_history";
@@ -15,6 +16,14 @@ import { kTurnDegrees, MapItemForm, turned } from "./map_item_form";
 import { MapView } from "./map_view";
 
 const kFarStep = 10;
+
+export const kEditorKeys: KeyList = [
+  ["Left Right Up Down", "Move the item by a pixel of the map; with Shift by ten"],
+  ["[ ]", "Turn the item"],
+  ["Delete", "Remove the item"],
+  ["Ctrl+Z Ctrl+Y", "Undo or redo"],
+  ["Ctrl+S", "Save"],
+];
 
 export class MapEditor {
   readonly root: HTMLElement;

@@ -21,6 +21,8 @@ import { iconButton } from "../widgets/button";
 import { Choice } from "../widgets/choice";
 import { element, setText } from "../widgets/dom";
 import { toggleFullScreen } from "../widgets/full_screen";
+import { hasFocusByPointer } from "../widgets/key_owner";
+import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { spanInWords } from "../widgets/text";
 import { keepTrying } from "./keep_trying";
@@ -36,9 +38,9 @@ const kMaxPlayers = 4;
 const kMaxRows = 20_000;
 const kZoomStep = 2;
 const kSettleMs = 150;
+const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", filter: "Filter" };
 
 export class EventsScreen extends Screen {
-const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", filter: "Filter" };
   readonly #recordings = new Recordings(this.server);
   readonly #cache = new FootageCache(this.#recordings, () => this.#showFootage());
   readonly #days = new RecordedDays(this.#recordings, () => this.#showDays());
@@ -60,11 +62,11 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
   readonly #calendar: Calendar;
   readonly #transport: Transport;
   readonly #status = element("p", { class: "bar-status" });
-  #cameras: Camera[] = [];
-  /** What the address asks for while it is being looked up. */
   readonly #body = element("div", { class: "events-body" });
   /** What is shown below the player where there is no room for all of it. */
   readonly #panels = new Choice("Show", kPanels, "list", (panel) => (this.#body.dataset["panel"] = panel));
+  #cameras: Camera[] = [];
+  /** What the address asks for while it is being looked up. */
   #opening = "";
   /** Why there is no list of cameras; empty when there is. */
   #error = "";
@@ -114,12 +116,25 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
     return true;
   }
 
+  protected get keys(): KeyList {
+    return [
+      ["Space", "Play or pause"],
+      ["Left Right", "One frame back or on; with Shift ten"],
+      ["Up Down", "The event before or after"],
+      ["[ ]", "Slower or faster"],
+      ["+ -", "On the timeline: show less or more time"],
+      ["PageUp PageDown", "On the timeline: earlier or later"],
+      ["End", "On the timeline: now"],
+      ["F", "Full screen"],
+    ];
+  }
+
   protected pressKey(event: KeyboardEvent): boolean {
-    const target = event.target as HTMLElement;
-    const isTyping = /^(SELECT|SUMMARY)$/.test(target.tagName) || target.closest("label") !== null;
-    const isButton = /^(BUTTON|A|INPUT)$/.test(target.tagName);
-    if (isTyping) return false;
-    if (event.key === " " && !isButton) this.#togglePlaying();
+    // From day to day and from row to row, for whoever came there with the keyboard.
+    const isWithin = (selector: string) => !hasFocusByPointer() && (event.target as Element).closest(selector) !== null;
+    if (event.key.startsWith("Arrow") && isWithin(".calendar-days")) return false;
+    if (/^Arrow(Up|Down)$/.test(event.key) && isWithin(".list-space")) return false;
+    if (event.key === " ") this.#togglePlaying();
     else if (event.key === "ArrowLeft") this.#playback.step(event.shiftKey ? -10 : -1);
     else if (event.key === "ArrowRight") this.#playback.step(event.shiftKey ? 10 : 1);
     else if (event.key === "ArrowUp") void this.#skip(-1);
@@ -222,6 +237,7 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
   #pickDay(dayMs: number): void {
     this.#timeline.showDay(dayMs);
     this.#calendar.select(dayMs);
+    this.#panels.choose("list");
   }
 
   /** Loads what the timeline shows now, but not while it is still being moved. */
@@ -277,6 +293,7 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
     this.#stage.refresh();
     this.#timeline.setPlayhead(this.#playback.playheadMs, footage, this.#playback.isPlaying);
     this.#transport.refresh();
+    this.#calendar.mark(footage && this.#playback.playheadMs);
     this.#list.select(footage);
     this.#walk.refresh();
     if (!footage) return;
@@ -294,7 +311,6 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
   }
 
   #togglePlaying(): void {
-    this.#calendar.mark(footage && this.#playback.playheadMs);
     if (this.#playback.isPlaying) this.#playback.pause();
     else this.#playback.play();
   }

@@ -6,12 +6,14 @@ import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem,
 import { asServerError, type Camera, type ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { MapCard } from "../map/map_card";
-import { MapEditor } from "../map/map_editor";
+import { kEditorKeys, MapEditor } from "../map/map_editor";
 import type { MapItemView } from "../map/map_item";
 import { MapView } from "../map/map_view";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
+import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
+import { titleScreen } from "../widgets/title";
 import { keepTrying } from "./keep_trying";
 import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
 import { Screen, type Session } from "./screen";
@@ -88,6 +90,18 @@ export class MapsScreen extends Screen {
     return true;
   }
 
+  protected get keys(): KeyList {
+    if (this.#overlay.camera) return this.#overlay.keys;
+    const move: KeyList = [
+      ["Tab", "From item to item"],
+      ["+ -", "Zoom in or out"],
+      ["0", "The whole map"],
+      ["Left Right Up Down", "Move the map"],
+    ];
+    if (!this.#editor) return this.#edit.hidden ? move : [...move, ["E", "Edit the map"]];
+    return [...move.slice(0, 3), ...kEditorKeys];
+  }
+
   protected pressKey(event: KeyboardEvent): boolean {
     const isDone = this.#overlay.pressKey(event);
     if (isDone !== undefined) return isDone;
@@ -132,9 +146,11 @@ export class MapsScreen extends Screen {
     this.progress.hidden = true;
     if (!content) return this.#showNothing("This map does not exist, or you do not have permission to view it.");
     this.#map = { id, content };
+    titleScreen(this.#maps.find((map) => map.id === id)?.name ?? "Maps");
     this.#states = [];
     this.#showMessage("");
     this.#view.showItems(content.items, content);
+    this.#showStates();
     if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
     void this.#loadStates();
   }
@@ -153,7 +169,14 @@ export class MapsScreen extends Screen {
     const states = await this.#emaps.states(map.id).catch(() => null);
     if (!states || this.#map !== map) return;
     this.#states = states;
-    for (const view of this.#view.views) view.state = this.#stateOf(view)?.state ?? "";
+    this.#showStates();
+  }
+
+  #showStates(): void {
+    for (const view of this.#view.views) {
+      const isOff = view.item.kind === "camera" && view.item.port < 0 && !this.#cameraOf(view);
+      view.state = isOff ? "switched off" : (this.#stateOf(view)?.state ?? "");
+    }
   }
 
   #stateOf({ item }: MapItemView): DeviceState | undefined {
@@ -188,7 +211,7 @@ export class MapsScreen extends Screen {
     if (item.kind === "emap") return showMap(item.id);
     const camera = this.#cameraOf(view);
     if (item.kind === "camera" && item.port < 0) {
-      return camera ? showMap(map, camera) : notify(`${item.name} is disabled.`);
+      return camera ? showMap(map, camera) : notify(`${item.name} is switched off.`);
     }
     const open = camera && (() => showMap(map, camera));
     this.#card.show(view, camera, this.#stateOf(view)?.since ?? 0, open);

@@ -1,22 +1,29 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every screen of a logged-in user has: the bar with navigation, clock and log-out, the progress line, its keys, its
-// part of the address, and a say in whether the user may leave.
+// What every screen of a logged-in user has: title and heading, the bar with navigation, clock and log-out, the progress
+// line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may leave.
 
 import type { Account, Server } from "../../wire/server";
+import type { AbsentCameras } from "../wall/absent_cameras";
+import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
+import { isForFocused } from "../widgets/key_owner";
+import { KeysDialog, type KeyList } from "../widgets/keys_dialog";
 import { clockTime } from "../widgets/text";
+import { titleScreen } from "../widgets/title";
 import { logOutButton } from "./log_out";
 import { navigation } from "./navigation";
 import type { ScreenName } from "./route";
 
 const kClockMs = 500;
+const kNames: Record<ScreenName, string> = { wall: "Live", events: "Events", maps: "Maps" };
 
 /** What a screen is opened with. */
 export interface Session {
   readonly server: Server;
   readonly account: Account;
+  readonly absentCameras: AbsentCameras;
   /** Called when the user has logged out. */
   readonly onLogOut: () => void;
 }
@@ -28,18 +35,25 @@ export abstract class Screen {
   /** Bar, progress line and content; a screen may hide it behind something that covers the window. */
   protected readonly front: HTMLElement;
   protected readonly progress = element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" });
+  readonly #heading = element("h1", { class: "unseen", tabindex: "-1" });
   readonly #clock = element("time", { class: "bar-clock" });
+  readonly #keysDialog = new KeysDialog();
   readonly #closing = new AbortController();
 
   constructor(name: ScreenName, session: Session) {
     this.name = name;
     this.server = session.server;
-    const brand = element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven"));
+    titleScreen(kNames[name]);
+    setText(this.#heading, kNames[name]);
+    const brand = element("div", { class: "brand" }, icon("lighthouse"), element("span", {}, "Lookhaven"), this.#heading);
+    const keys = iconButton("keys", "Keys", () => this.#keysDialog.show(this.keys), "?");
+    keys.classList.add("show-keys");
     const logOut = logOutButton(session, () => this.canLeave(), (isBusy) => (this.progress.hidden = !isBusy));
-    const bar = element("header", { class: "bar" }, brand, navigation(name), this.#clock, logOut);
+    const bar = element("header", { class: "bar" }, brand, navigation(name), this.#clock, keys, logOut);
     this.front = element("div", { class: `front ${name}` }, bar, this.progress);
-    this.root = element("main", { class: "screen" }, this.front);
-    document.addEventListener("keydown", (event) => this.#onKey(event), { signal: this.closed });
+    this.root = element("main", { class: "screen" }, this.front, this.#keysDialog.root);
+    // Before the control that has the focus, which gets what the screen leaves to it.
+    document.addEventListener("keydown", (event) => this.#onKey(event), { signal: this.closed, capture: true });
     const showTime = () => setText(this.#clock, clockTime(Date.now()));
     this.every(kClockMs, showTime);
     showTime();
@@ -55,6 +69,11 @@ export abstract class Screen {
 
   /** Shows what the address names on this screen. Returns false where the user stays at what was shown before. */
   abstract followRoute(): boolean;
+
+  /** Tells a screen reader where the user is now. */
+  focus(): void {
+    this.#heading.focus({ preventScroll: true });
+  }
 
   /** Ends all that the screen has running. */
   close(): void {
@@ -77,11 +96,20 @@ export abstract class Screen {
     this.closed.addEventListener("abort", () => clearInterval(timer));
   }
 
-  /** Does what a key without Ctrl, Alt or Meta asks for; returns false for one that means nothing here. */
+  /** What `pressKey` does, and what the browser does, where nobody would guess. */
+  protected abstract get keys(): KeyList;
+
+  /**
+   * Does what a key without Ctrl, Alt or Meta asks for; returns false for one that means nothing here. Not called for a key
+   * that belongs to what has the focus.
+   */
   protected abstract pressKey(event: KeyboardEvent): boolean;
 
   #onKey(event: KeyboardEvent): void {
-    if (event.altKey || event.ctrlKey || event.metaKey || event.defaultPrevented) return;
-    if (this.pressKey(event)) event.preventDefault();
+    if (event.altKey || event.ctrlKey || event.metaKey || this.#keysDialog.isOpen || isForFocused(event)) return;
+    if (event.key === "?") this.#keysDialog.show(this.keys);
+    else if (!this.pressKey(event)) return;
+    event.preventDefault();
+    event.stopPropagation();
   }
 }

@@ -6,10 +6,14 @@ import { missingDecoder } from "../../live/unplayable";
 import { kVideoTypeMjpeg, ServerError, type Camera, type CameraList } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { unplayableHint } from "../camera/unplayable_hint";
+import type { AbsentCameras } from "../wall/absent_cameras";
 import { Grid } from "../wall/grid";
 import { layoutPicker } from "../wall/layout_picker";
 import { element, setText } from "../widgets/dom";
+import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon, type IconName } from "../widgets/icons";
+import type { KeyList } from "../widgets/keys_dialog";
+import { keepTrying } from "./keep_trying";
 import { openCamera, showCamera, showWall } from "./route";
 import { Screen, type Session } from "./screen";
 
@@ -22,6 +26,7 @@ export class WallScreen extends Screen {
   readonly #grid: Grid;
   readonly #overlay: CameraOverlay;
   readonly #status = element("p", { class: "bar-status" });
+  readonly #absent: AbsentCameras;
   readonly #message = element("div", { class: "wall-message" });
   readonly #advice = element("p", { class: "wall-advice", role: "note", hidden: true });
   #cameras: Camera[] | null = null;
@@ -30,13 +35,18 @@ export class WallScreen extends Screen {
 
   constructor(session: Session) {
     super("wall", session);
+    this.#absent = session.absentCameras;
     const actions = { back: showWall, step: (by: 1 | -1) => this.#step(by) };
     this.#overlay = new CameraOverlay(this.server, this.root, this.front, actions);
     this.#grid = new Grid(this.server, {
       open: (camera) => showCamera(camera.id),
       snapshot: (camera) => this.#overlay.takeSnapshot(camera),
+      dismiss: ({ id }) => {
+        this.#absent.dismiss(id);
+        this.#showTiles();
+      },
     });
-    this.addToBar(this.#status, layoutPicker((choice) => this.#grid.setLayout(choice)));
+    this.addToBar(this.#status, layoutPicker((choice) => this.#grid.setLayout(choice)), fullScreenButton());
     this.front.append(this.#advice, this.#message, this.#grid.root);
     const loadUnlessHidden = () => void (document.hidden || this.#load());
     document.addEventListener("visibilitychange", loadUnlessHidden, { signal: this.closed });
@@ -44,7 +54,7 @@ export class WallScreen extends Screen {
     this.every(kRefreshMs, () => this.#refresh());
     this.every(kSignalLossesIntervalMs, () => void (document.hidden || this.server.signalLosses.refresh()));
     this.#refresh();
-    void this.#load();
+    void this.#start();
   }
 
   override close(): void {
@@ -61,38 +71,67 @@ export class WallScreen extends Screen {
     return true;
   }
 
+  protected get keys(): KeyList {
+    if (this.#overlay.camera) return this.#overlay.keys;
+    return [
+      ["Left Right Up Down", "From camera to camera"],
+      ["Enter", "Open the camera large"],
+      ["S", "Snapshot of the camera"],
+      ["F", "Full screen"],
+    ];
+  }
+
   protected pressKey(event: KeyboardEvent): boolean {
     const isDone = this.#overlay.pressKey(event);
     if (isDone !== undefined) return isDone;
+    if (event.key.toLowerCase() === "f") {
+      toggleFullScreen();
+      return true;
+    }
     const camera = this.#grid.currentTile()?.camera;
     if (event.key.toLowerCase() !== "s" || !camera) return false;
     this.#overlay.takeSnapshot(camera);
     return true;
   }
 
+  async #start(): Promise<void> {
+    void this.server.signalLosses.refresh();
+    const failed = (sentence: string) => this.#showMessage("warning", sentence);
+    const list = await keepTrying(() => this.server.cameras(), failed, this.closed);
+    if (!list) return;
+    this.progress.hidden = true;
+    this.#showList(list);
+    this.#refresh();
+  }
+
+  /** Brings the list up to date. */
   async #load(): Promise<void> {
+    if (!this.#cameras) return;
     const [list] = await Promise.all([
       this.server.cameras().catch((error: ServerError) => error),
       this.server.signalLosses.refresh(),
     ]);
     if (this.closed.aborted) return;
     this.#error = list instanceof ServerError ? list.message : "";
-    this.progress.hidden = true;
     if (!(list instanceof ServerError)) this.#showList(list);
-    else if (!this.#cameras) this.#showMessage("warning", list.message, true);
     this.#refresh();
   }
 
   #showList(list: CameraList): void {
     this.#cameras = list.camera ?? [];
-    this.#grid.setCameras(this.#cameras);
-    if (this.#cameras.length > 0) this.#message.replaceChildren();
-    else if (list.CamNum > 0) this.#showMessage("camera", "No camera is enabled.", false);
+    this.#absent.update(list);
+    this.#showTiles();
+    if (this.#cameras.length + this.#absent.all.length > 0) this.#message.replaceChildren();
+    else if (list.CamNum > 0) this.#showMessage("camera", "No camera is switched on. A manager switches one on with “lookhaven camera set 1 --enable”.");
     else if (list.isManager)
-      this.#showMessage("camera", "No cameras yet. Add one on the server with “lookhaven camera add”.", false);
-    else this.#showMessage("camera", "You do not have permission to view any camera yet.", false);
+      this.#showMessage("camera", "No cameras yet. Add one on the server with “lookhaven camera add”.");
+    else this.#showMessage("camera", "You do not have permission to view any camera yet. Ask a manager for it.");
     this.#showAdvice(this.#cameras.some(({ video_type }) => video_type !== kVideoTypeMjpeg));
     this.followRoute();
+  }
+
+  #showTiles(): void {
+    this.#grid.setCameras(this.#cameras ?? [], this.#absent.all);
   }
 
   /** Where the page came over plain HTTP, it can do less than over HTTPS. */
@@ -102,18 +141,8 @@ export class WallScreen extends Screen {
     if (missing && !this.#advice.hasChildNodes()) this.#advice.append(...unplayableHint(missing));
   }
 
-  #showMessage(name: IconName, sentence: string, canRetry: boolean): void {
-    const parts: Node[] = [icon(name), element("p", { role: canRetry ? "alert" : "status" }, sentence)];
-    if (canRetry) {
-      const retry = element("button", { type: "button", class: "button" }, "Try again");
-      retry.addEventListener("click", () => {
-        this.progress.hidden = false;
-        this.#message.replaceChildren();
-        void this.#load();
-      });
-      parts.push(retry);
-    }
-    this.#message.replaceChildren(...parts);
+  #showMessage(name: IconName, sentence: string): void {
+    this.#message.replaceChildren(icon(name), element("p", { role: "status" }, sentence));
   }
 
   #refresh(): void {

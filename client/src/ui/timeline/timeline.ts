@@ -52,6 +52,11 @@ export class Timeline {
     class: "timeline-lanes",
     tabindex: "0",
     role: "slider",
+    // Seconds; what is told is the text.
+    "aria-valuemin": "0",
+    "aria-valuemax": String(2 ** 32),
+    "aria-valuenow": "0",
+    "aria-valuetext": "nothing plays",
     "aria-label": "Timeline: plus and minus zoom, page keys move, End goes to now",
   });
   readonly #names = element("div", { class: "timeline-names" });

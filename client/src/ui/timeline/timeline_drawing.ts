@@ -37,9 +37,10 @@ export function coloursOf(root: Element): Colours {
   return Object.fromEntries(names.map((name) => [name, style.getPropertyValue(`--${name}`).trim()])) as unknown as Colours;
 }
 
-const kRecorded = "#20262c";
-const kContinuous = "#47525d";
-const kSelected = "#8a97a4";
+/** Each at least 3 : 1 on the page, and told from the one before. */
+const kRecorded = "#5a6672";
+const kContinuous = "#7b8896";
+const kSelected = "#c3ced8";
 
 /** Makes the canvas as large as it is shown, in the screen's own pixels; what is drawn is in CSS pixels. */
 export function prepare(canvas: HTMLCanvasElement, widthPx: number, heightPx: number): CanvasRenderingContext2D {

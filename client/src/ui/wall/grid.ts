@@ -9,6 +9,7 @@ import { chooseStreams, streamLimit } from "../../live/stream_budget";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { element } from "../widgets/dom";
+import type { AbsentCamera } from "./absent_cameras";
 import { arrange, type LayoutChoice } from "./layout";
 import { Tile, type TileActions, type TileMode } from "./tile";
 
@@ -61,19 +62,20 @@ export class Grid {
     this.root.addEventListener("keydown", (event) => this.#onKey(event));
   }
 
-  /** Shows these cameras in this order; tiles of cameras that stay play on without interruption. */
-  setCameras(cameras: readonly Camera[]): void {
-    const unchanged = new Map(
-      [...this.#tiles].filter(([, tile]) => cameras.some((camera) => same(camera, tile.camera))),
-    );
-    for (const [id, tile] of this.#tiles) if (!unchanged.has(id)) this.#remove(tile);
-    for (const camera of cameras) {
-      if (unchanged.has(camera.id)) continue;
-      const tile = new Tile(camera, this.#server, this.#semaphore, this.#actions);
+  /** Shows these cameras in this order, then those that are absent; tiles of cameras that stay play on without interruption. */
+  setCameras(cameras: readonly Camera[], absent: readonly AbsentCamera[]): void {
+    const all = [...cameras.map((camera) => ({ camera, reason: "" })), ...absent];
+    const isUnchanged = (tile: Tile) => {
+      return all.some(({ camera, reason }) => same(camera, tile.camera) && reason === tile.picture.absence);
+    };
+    for (const tile of [...this.#tiles.values()]) if (!isUnchanged(tile)) this.#remove(tile);
+    for (const { camera, reason } of all) {
+      if (this.#tiles.has(camera.id)) continue;
+      const tile = new Tile(camera, reason, this.#server, this.#semaphore, this.#actions);
       this.#tiles.set(camera.id, tile);
       this.#observer.observe(tile.root);
     }
-    const wanted = cameras.flatMap((camera) => this.#tiles.get(camera.id) ?? []);
+    const wanted = all.flatMap(({ camera }) => this.#tiles.get(camera.id) ?? []);
     // Moving a tile that is in its place already would take the focus from it.
     wanted.forEach((tile, index) => {
       if (this.root.children[index] !== tile.root) this.root.insertBefore(tile.root, this.root.children[index] ?? null);
@@ -136,7 +138,8 @@ export class Grid {
   }
 
   #assign(): void {
-    const shown = document.hidden ? [] : this.#inOrder().filter((tile) => this.#visible.has(tile.camera.id));
+    const isShown = (tile: Tile) => this.#visible.has(tile.camera.id) && tile.picture.absence === "";
+    const shown = document.hidden ? [] : this.#inOrder().filter(isShown);
     const playable = shown.filter((tile) => !tile.unplayable).map((tile) => tile.camera.id);
     const streaming = new Set(this.#inOrder().flatMap((tile) => (tile.isStreaming ? [tile.camera.id] : [])));
     const chosen = chooseStreams(playable, streaming, this.#maxStreams);

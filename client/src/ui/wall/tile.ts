@@ -18,6 +18,8 @@ export type TileMode = "off" | "poll" | "stream-small" | "stream-full";
 export interface TileActions {
   open(camera: Camera): void;
   snapshot(camera: Camera): void;
+  /** Takes the tile of a camera that is absent off the wall. */
+  dismiss(camera: Camera): void;
 }
 
 export class Tile {
@@ -30,7 +32,8 @@ export class Tile {
   readonly #stills: SnapshotSource;
   readonly #streams: Record<Exclude<TileMode, "off" | "poll">, StreamSource>;
 
-  constructor(camera: Camera, server: Server, semaphore: Semaphore, actions: TileActions) {
+  /** `absence` says why the camera is absent, and is empty for one that is there. */
+  constructor(camera: Camera, absence: string, server: Server, semaphore: Semaphore, actions: TileActions) {
     this.camera = camera;
     this.#server = server;
     this.#stills = new SnapshotSource(server, camera, semaphore);
@@ -45,6 +48,8 @@ export class Tile {
       () => this.#showState(),
       false,
     );
+    this.picture.absence = absence;
+    this.#open.disabled = absence !== "";
     this.#open.append(this.picture.root);
     this.#open.addEventListener("click", () => actions.open(camera));
     const bar = element(
@@ -53,7 +58,9 @@ export class Tile {
       element("span", { class: "dot" }),
       element("span", { class: "tile-name", title: camera.name }, camera.name),
       this.#state,
-      iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
+      absence
+        ? iconButton("close", `Take ${camera.name} off the wall`, () => actions.dismiss(camera))
+        : iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
     );
     this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, this.#open, bar);
     this.picture.refresh();
@@ -83,7 +90,8 @@ export class Tile {
     this.root.dataset["state"] = state.kind;
     const text = this.#stateText(state);
     setText(this.#state, text);
-    this.#open.setAttribute("aria-label", `${this.camera.name}, ${text}: open large`);
+    const does = state.kind === "absent" ? state.reason : `${text}: open large`;
+    this.#open.setAttribute("aria-label", `${this.camera.name}, ${does}`);
   }
 
   /** Short, since the picture itself shows the whole sentence. */
@@ -97,6 +105,7 @@ export class Tile {
       case "connecting":
         return signalText(state, this.picture.feed.source?.pollIntervalMs);
       case "idle":
+      case "absent":
         return "";
     }
   }

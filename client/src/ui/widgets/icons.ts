@@ -46,6 +46,7 @@ const kShapes = {
   turnRight: "M19 5v5h-5 M18.5 10a7.5 7.5 0 1 0 .8 5",
   remove: "M5 7h14 M9.5 7V4.5h5V7 M6.5 7l1 13h9l1-13 M10 11v5.5 M14 11v5.5",
   fit: "M4 9V4h5 M20 9V4h-5 M4 15v5h5 M20 15v5h-5 M9 9h6v6H9Z",
+  keys: "M4.5 6.5h15A1.5 1.5 0 0 1 21 8v8a1.5 1.5 0 0 1-1.5 1.5h-15A1.5 1.5 0 0 1 3 16V8a1.5 1.5 0 0 1 1.5-1.5Z M7 10.5h.01 M10.3 10.5h.01 M13.7 10.5h.01 M17 10.5h.01 M8.5 14h7",
   layoutAuto: "M4 4h9.5v16H4Z M17 4h3v5h-3Z M17 12.5h3V20h-3Z",
   layout1: "M4 5h16v14H4Z",
   layout2: "M4 5h16v14H4Z M12 5v14 M4 12h16",

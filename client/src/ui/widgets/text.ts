@@ -91,6 +91,6 @@ export function signalText(state: SignalState, pollIntervalMs = 0): string {
     case "live":
       return pollIntervalMs > 0 ? `live, every ${pollIntervalMs / 1000} s` : "live";
     case "lost":
-      return `no signal since ${sinceText(state.sinceMs, Date.now())}`;
+      return state.sinceMs === null ? "no signal" : `no signal since ${sinceText(state.sinceMs, Date.now())}`;
   }
 }

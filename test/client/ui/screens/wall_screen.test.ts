@@ -78,6 +78,17 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.getAttribute("[data-camera='1']", "data-state")).toBe("live");
     server.stalled.clear();
     await allLive(page, 3);
+    // One of 4:3, and one that the server does not list any more.
+    server.pictures.set(1, await page.screenshot({ type: "jpeg", clip: { x: 0, y: 0, width: 40, height: 30 } }));
+    server.cameras.splice(1, 1);
+    await page.evaluate(() => document.dispatchEvent(new Event("visibilitychange")));
+    await page.locator("[data-camera='2'][data-state=absent] .message", { hasText: "Removed" }).waitFor();
+    await page.waitForFunction(() => document.querySelector<HTMLCanvasElement>("[data-camera='1'] canvas")!.width === 40);
+    const [first, second] = await page.locator(".tile").evaluateAll((tiles) => tiles.map((tile) => tile.getBoundingClientRect().bottom));
+    expect(first).toBe(second);
+    server.pictures.clear();
+    await page.click("[aria-label^='Take Camera'] ");
+    await page.waitForSelector("[data-camera='2']", { state: "detached" });
   }, 40_000);
 
   test("all can be done with keys; a snapshot opens over the picture and closes without leaving it", async () => {

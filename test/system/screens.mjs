@@ -1,0 +1,59 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One visit to every screen: what axe-core finds on a desk and on a phone, what the page is called, what has the focus.
+// Pictures of each are taken at all sizes.
+import { readFileSync } from "node:fs";
+import { createRequire } from "node:module";
+import { address, folder, logIn, report, visit } from "./chromium.mjs";
+
+const axe = readFileSync(createRequire(import.meta.url).resolve("axe-core/axe.min.js"), "utf8");
+const sizes = { desk: [1440, 900], laptop: [1024, 768], side: [844, 390], phone: [390, 844] };
+
+await visit(async (page, complaints) => {
+  /** Waits for the selector, then looks at what is shown. */
+  const look = async (name, selector) => {
+    await page.locator(selector).first().waitFor({ timeout: 20_000 });
+    const facts = { title: await page.title(), focus: await page.evaluate(() => document.activeElement.textContent) };
+    const violations = [];
+    for (const [size, [width, height]] of Object.entries(sizes)) {
+      await page.setViewportSize({ width, height });
+      await page.waitForTimeout(500);
+      await page.screenshot({ path: `${folder}/${name}-${size}.png` });
+      if (size === "laptop" || size === "side") continue;
+      await page.evaluate(axe);
+      const found = (await page.evaluate(() => window.axe.run())).violations;
+      violations.push(...found.map(({ id, nodes }) => `${size}: ${id}: ${nodes.map(({ target }) => target).join(" ")}`));
+    }
+    await page.setViewportSize({ width: 1440, height: 900 });
+    await report(name, { ...facts, violations, complaints });
+  };
+  const go = (hash) => page.evaluate((to) => void (location.hash = to), hash);
+
+  await page.goto(address);
+  await look("log-in", ".login-form");
+  await logIn(page);
+  await look("wall", '[data-camera="1"][data-state="live"]');
+  await page.keyboard.press("?");
+  await look("keys", "dialog[open] kbd");
+  await page.keyboard.press("Escape");
+  await page.keyboard.press("Tab");
+  await go("#camera=1");
+  await look("large", '.large[data-state="live"]');
+  await page.keyboard.press("s");
+  await look("snapshot", "dialog[open] canvas");
+  await page.keyboard.press("Escape");
+  await go("#events");
+  await look("events", ".row");
+  await page.locator(".row-open:enabled").first().click();
+  await look("playing", '.stage-picture[data-state="playing"]');
+  for (const panel of ["Calendar", "Timeline", "Filter"]) {
+    await page.setViewportSize({ width: 390, height: 844 });
+    await page.getByRole("button", { name: panel, exact: true }).click();
+    await look(panel.toLowerCase(), ".events-body");
+  }
+  await go("#map=1");
+  await look("map", ".map-item");
+  await page.keyboard.press("e");
+  await page.locator(".map-editor .map-item").first().click();
+  await look("editor", ".map-form");
+});

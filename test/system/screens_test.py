@@ -1,0 +1,37 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# Every screen can be used by everyone: no violation of the rules of axe-core, a title, and the focus at the heading.
+import unittest
+
+from installation import Installation, recorded_events, wait_until
+from visit import Visit
+
+
+class ScreensTest(unittest.TestCase):
+    def test_every_screen(self):
+        server = self.enterContext(Installation())
+        wait_until(lambda: recorded_events(server, 1), 30, "an event of camera 1")
+        with Visit("screens.mjs", f"http://127.0.0.1:{server.port}/") as visit:
+            for name, title, focus in [
+                ("log-in", "Log in", None),
+                ("wall", "Live", "Live"),
+                ("keys", "Live", None),
+                ("large", "Entrance", "Entrance"),
+                ("snapshot", "Entrance", None),
+                ("events", "Events", "Events"),
+                ("playing", "Events", None),
+                ("calendar", "Events", None),
+                ("timeline", "Events", None),
+                ("filter", "Events", None),
+                ("map", "Ground floor", "Maps"),
+                ("editor", "Ground floor", None),
+            ]:
+                seen = visit.see(name)
+                with self.subTest(name):
+                    self.assertEqual(seen["title"], f"{title} · Lookhaven")
+                    self.assertIn(focus, (None, seen["focus"]))
+                    self.assertEqual(seen["violations"] + seen["complaints"], [])
+
+
+if __name__ == "__main__":
+    unittest.main()
