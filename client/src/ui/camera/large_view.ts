@@ -11,6 +11,7 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon } from "../widgets/icons";
+import { magnify } from "../widgets/magnify";
 import { notify } from "../widgets/notice";
 import { signalText } from "../widgets/text";
 import { LivePicture } from "./live_picture";
@@ -58,6 +59,7 @@ export class LargeView {
       () => this.#showState(),
       true,
     );
+    magnify(this.#picture.root, this.#picture.canvas);
     if (still?.hasPicture) this.#picture.showStill(still.canvas);
     this.#name = element("h1", { class: "large-name", tabindex: "-1", title: camera.name }, camera.name);
     this.#soundButton.append(icon("soundOff"), icon("soundOn"), this.#soundLabel);

@@ -146,7 +146,7 @@ export class EventList {
     setText(name, this.#nameOf(one.camera));
     setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
     setText(side, one.isGrowing ? "recording" : one.isSaved ? duration(one.stop - one.start) : "no footage");
-    side.classList.toggle("growing", one.isGrowing);
+    side.classList.toggle("recording", one.isGrowing);
     button.disabled = !one.isSaved;
     button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
     button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describeMark(one)].filter(Boolean).join("\n");

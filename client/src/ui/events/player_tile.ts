@@ -6,6 +6,7 @@ import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
+import { magnify } from "../widgets/magnify";
 import { clockTime, preciseTime, shortDate } from "../widgets/text";
 
 export class PlayerTile {
@@ -40,6 +41,7 @@ export class PlayerTile {
     const caption = element("p", { class: "stage-caption" }, element("span", {}, name), this.#time);
     this.root = element("figure", { class: "picture stage-picture" }, this.#canvas, caption, message);
     this.#canvas.setAttribute("aria-label", `Recording of ${name}`);
+    magnify(this.root, this.#canvas);
     this.refresh(null);
   }
 

@@ -14,6 +14,7 @@ const kKindNames: Record<ItemKind, string> = {
   io: "Port",
   pos: "POS terminal",
 };
+const kDoorIcons: Record<string, IconName> = { open: "doorOpen", locked: "doorLocked" };
 const kTextPositions = ["below", "above", "left", "right"];
 
 /** As it is before it is placed and turned. */
@@ -34,6 +35,7 @@ export function titleOf(item: MapItem): string {
 export class MapItemView {
   readonly root: HTMLButtonElement;
   readonly #name = element("span", { class: "map-name" });
+  readonly #icon = element("span", { class: "map-icon" });
   #state = "";
 
   constructor(public item: MapItem) {
@@ -43,9 +45,10 @@ export class MapItemView {
       "button",
       { type: "button", class: "map-item", "data-kind": isCamera || item.kind !== "camera" ? item.kind : "io" },
       ...(isCamera ? [element("span", { class: "map-cone" })] : []),
-      element("span", { class: "map-icon" }, icon(isCamera || item.kind !== "camera" ? kIcons[item.kind] : "io")),
+      this.#icon,
       this.#name,
     );
+    this.#icon.append(icon(isCamera || item.kind !== "camera" ? kIcons[item.kind] : "io"));
     this.show(item);
   }
 
@@ -62,7 +65,9 @@ export class MapItemView {
 
   /** The last reported state of the device: "open", "on"; empty where unknown. */
   set state(state: string) {
+    if (state === this.#state) return;
     this.#state = state;
+    if (this.item.kind === "door") this.#icon.replaceChildren(icon(kDoorIcons[state] ?? kIcons.door));
     this.root.dataset["state"] = state;
     this.#label();
   }

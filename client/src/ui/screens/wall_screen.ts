@@ -74,7 +74,7 @@ export class WallScreen extends Screen {
   protected get keys(): KeyList {
     if (this.#overlay.camera) return this.#overlay.keys;
     return [
-      ["Left Right Up Down", "From camera to camera"],
+      ["Left Right Up Down", "From camera to camera; with Shift the camera moves along"],
       ["Enter", "Open the camera large"],
       ["S", "Snapshot of the camera"],
       ["F", "Full screen"],

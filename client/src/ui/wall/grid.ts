@@ -12,6 +12,7 @@ import { element } from "../widgets/dom";
 import type { AbsentCamera } from "./absent_cameras";
 import { arrange, type LayoutChoice } from "./layout";
 import { Tile, type TileActions, type TileMode } from "./tile";
+import { dragToOrder, inOwnOrder, keepOrder } from "./tile_order";
 
 /** Scrolling past a tile must not open and close a stream. */
 const kSettleMs = 120;
@@ -45,7 +46,6 @@ export class Grid {
   #settling: ReturnType<typeof setTimeout> | undefined;
   #layout: LayoutChoice = "auto";
   #columns = 1;
-  #tilePx = 0;
   /** The ids of tiles that cannot play a stream, as text to compare. */
   #unplayable = "";
 
@@ -60,11 +60,12 @@ export class Grid {
     this.#resized.observe(this.root);
     document.addEventListener("visibilitychange", this.#assignSoon);
     this.root.addEventListener("keydown", (event) => this.#onKey(event));
+    dragToOrder(this.root, () => this.#onMoved());
   }
 
-  /** Shows these cameras in this order, then those that are absent; tiles of cameras that stay play on without interruption. */
+  /** Shows these cameras, then those that are absent; tiles of cameras that stay play on without interruption. */
   setCameras(cameras: readonly Camera[], absent: readonly AbsentCamera[]): void {
-    const all = [...cameras.map((camera) => ({ camera, reason: "" })), ...absent];
+    const all = [...inOwnOrder(cameras).map((camera) => ({ camera, reason: "" })), ...absent];
     const isUnchanged = (tile: Tile) => {
       return all.some(({ camera, reason }) => same(camera, tile.camera) && reason === tile.picture.absence);
     };
@@ -143,8 +144,9 @@ export class Grid {
     const playable = shown.filter((tile) => !tile.unplayable).map((tile) => tile.camera.id);
     const streaming = new Set(this.#inOrder().flatMap((tile) => (tile.isStreaming ? [tile.camera.id] : [])));
     const chosen = chooseStreams(playable, streaming, this.#maxStreams);
-    const stream: TileMode = this.#tilePx * devicePixelRatio > kMaxSmallPicturePx ? "stream-full" : "stream-small";
     for (const tile of this.#inOrder()) {
+      const widthPx = tile.root.clientWidth * devicePixelRatio;
+      const stream: TileMode = widthPx > kMaxSmallPicturePx ? "stream-full" : "stream-small";
       tile.mode = chosen.has(tile.camera.id) ? stream : shown.includes(tile) ? "poll" : "off";
     }
   }
@@ -165,7 +167,8 @@ export class Grid {
       barPx: parseFloat(style.getPropertyValue("--tile-bar")),
     });
     this.#columns = columns;
-    this.#tilePx = tilePx;
+    this.root.dataset["columns"] = String(columns);
+    this.root.dataset["layout"] = this.#layout;
     this.root.style.setProperty("--columns", String(columns));
     this.root.style.setProperty("--tile-width", `${tilePx}px`);
     this.#assignSoon();
@@ -177,7 +180,18 @@ export class Grid {
     if (!step || !current || event.altKey || event.ctrlKey || event.metaKey) return;
     event.preventDefault();
     const tiles = this.#inOrder();
-    tiles[tiles.indexOf(current) + step(this.#columns)]?.focus();
+    const other = tiles[tiles.indexOf(current) + step(this.#columns)];
+    if (!event.shiftKey) return other?.focus();
+    if (!other) return;
+    if (step(this.#columns) > 0) other.root.after(current.root);
+    else other.root.before(current.root);
+    current.focus();
+    this.#onMoved();
+  }
+
+  #onMoved(): void {
+    keepOrder(this.#inOrder().map(({ camera }) => camera.id));
+    this.#assignSoon();
   }
 }
 

@@ -2,8 +2,8 @@
 //
 // The layouts of the wall: how many columns, and how wide a tile is.
 
-/** All cameras on the screen, or this many columns and rows. */
-export const kLayoutChoices = ["auto", "1", "2", "3"] as const;
+/** All cameras on the screen, the first of them large, or this many columns and rows. */
+export const kLayoutChoices = ["auto", "first", "1", "2", "3", "4"] as const;
 export type LayoutChoice = (typeof kLayoutChoices)[number];
 
 export interface Space {
@@ -19,6 +19,8 @@ export interface Space {
 const kPhoneWidthPx = 640;
 const kMinTilePx = 240;
 const kPictureRatio = 16 / 9;
+/** Of the layout with one large camera; that one takes all columns but one, and as many rows. */
+const kColumnsBesideFirst = 4;
 
 /** Columns and width of a tile; what does not fit on the screen is scrolled. */
 export function arrange(tiles: number, choice: LayoutChoice, space: Space): { columns: number; tilePx: number } {
@@ -29,6 +31,12 @@ export function arrange(tiles: number, choice: LayoutChoice, space: Space): { co
   };
 
   if (space.widthPx < kPhoneWidthPx) return { columns: 1, tilePx: widthFor(1) };
+  if (choice === "first") {
+    const large = kColumnsBesideFirst - 1;
+    const rows = large + Math.max(0, Math.ceil((tiles - 1 - large) / kColumnsBesideFirst));
+    const columns = kColumnsBesideFirst;
+    return { columns, tilePx: Math.max(widthToFit(columns, rows), Math.min(kMinTilePx, widthFor(columns))) };
+  }
   if (choice !== "auto") {
     const side = Number(choice);
     return { columns: side, tilePx: Math.max(widthToFit(side, side), Math.min(kMinTilePx, widthFor(side))) };

@@ -10,9 +10,11 @@ import { kLayoutChoices, type LayoutChoice } from "./layout";
 const kStorageKey = "lookhaven.layout";
 const kLabels: Record<LayoutChoice, [IconName, string]> = {
   auto: ["layoutAuto", "All cameras on the screen"],
+  first: ["layoutFirst", "The first camera large"],
   "1": ["layout1", "One camera"],
   "2": ["layout2", "Two by two"],
   "3": ["layout3", "Three by three"],
+  "4": ["layout4", "Four by four"],
 };
 
 /** `onChoose` gets the choice of the last visit at once, and then each one that the user makes. */

@@ -37,6 +37,8 @@ const kShapes = {
   warning: "M12 4 2.8 19.5h18.4Z M12 10v4.5 M12 17v.2",
   map: "M9 4.5 3.5 6.5v13L9 17.5l6 2 5.5-2v-13L15 6.5Z M9 4.5v13 M15 6.5v13",
   door: "M6.5 20.5v-16A1 1 0 0 1 7.5 3.5h9a1 1 0 0 1 1 1v16 M3.5 20.5h17 M14.2 12v.6",
+  doorOpen: "M6.5 20.5v-16A1 1 0 0 1 7.5 3.5h9 M3.5 20.5h17 M6.5 4.5l7 3v15l-7-2 M11.2 14v.6",
+  doorLocked: "M7.5 11h9a1 1 0 0 1 1 1v7a1 1 0 0 1-1 1h-9a1 1 0 0 1-1-1v-7a1 1 0 0 1 1-1Z M8.5 11V7.5a3.5 3.5 0 0 1 7 0V11 M12 14.5v2",
   io: "M12 3.5v6 M8 6.5a7.5 7.5 0 1 0 8 0",
   pos: "M5 3.5h14v17l-2.3-1.8-2.4 1.8-2.3-1.8-2.3 1.8-2.4-1.8L5 20.5Z M8.5 8h7 M8.5 12h7",
   edit: "M4 20l1-4.5L16 4.5l3.5 3.5L8.5 19Z M13.5 7l3.5 3.5",
@@ -48,9 +50,11 @@ const kShapes = {
   fit: "M4 9V4h5 M20 9V4h-5 M4 15v5h5 M20 15v5h-5 M9 9h6v6H9Z",
   keys: "M4.5 6.5h15A1.5 1.5 0 0 1 21 8v8a1.5 1.5 0 0 1-1.5 1.5h-15A1.5 1.5 0 0 1 3 16V8a1.5 1.5 0 0 1 1.5-1.5Z M7 10.5h.01 M10.3 10.5h.01 M13.7 10.5h.01 M17 10.5h.01 M8.5 14h7",
   layoutAuto: "M4 4h9.5v16H4Z M17 4h3v5h-3Z M17 12.5h3V20h-3Z",
+  layoutFirst: "M4 4h11v11H4Z M17.5 4H20v3h-2.5Z M17.5 10H20v5h-2.5Z M4 17.5h4V20H4Z M11 17.5h4V20h-4Z M17.5 17.5H20V20h-2.5Z",
   layout1: "M4 5h16v14H4Z",
   layout2: "M4 5h16v14H4Z M12 5v14 M4 12h16",
   layout3: "M4 5h16v14H4Z M9.3 5v14 M14.7 5v14 M4 9.7h16 M4 14.3h16",
+  layout4: "M4 4h16v16H4Z M8 4v16 M12 4v16 M16 4v16 M4 8h16 M4 12h16 M4 16h16",
 } as const;
 
 export type IconName = keyof typeof kShapes;

@@ -108,6 +108,27 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.waitForSelector(".tile[data-camera='2'] :focus");
   }, 40_000);
 
+  test("tiles change places by mouse and keys, and stay there; one can be large; a picture can be magnified", async () => {
+    const page = await loggedIn(4);
+    const order = () => page.locator(".tile").evaluateAll((tiles) => tiles.map((tile) => (tile as HTMLElement).dataset["camera"]).join(""));
+    await page.focus("[data-camera='1'] .tile-open");
+    await page.keyboard.press("Shift+ArrowRight");
+    expect(await order()).toBe("2134");
+    await page.dragAndDrop("[data-camera='2'] .tile-open", "[data-camera='4'] .tile-open");
+    expect([await order(), await page.locator(".large").count()], "the end of a drag is no click").toEqual(["1342", 0]);
+    await page.click("[data-layout='first']");
+    await page.reload();
+    await page.waitForFunction(() => {
+      const widths = [...document.querySelectorAll(".tile")].map(({ clientWidth }) => clientWidth);
+      return widths.length === 4 && widths[0]! > 3 * widths[1]!;
+    });
+    expect(await order()).toBe("1342");
+    await page.click(".tile-open");
+    await page.waitForSelector(".large[data-state=live]");
+    await page.mouse.wheel(0, -400);
+    await page.waitForFunction(() => document.querySelector(".large canvas")!.getBoundingClientRect().width > innerWidth * 1.5);
+  }, 40_000);
+
   test("all kinds of cameras side by side; sound on demand, and the picture in step with it", async () => {
     const page = await loggedIn([13, 1, 2, 3, 12]);
     await allLive(page, 5);

@@ -1,0 +1,66 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The user's own order of the tiles, kept for the next visit, and how the pointer changes it.
+
+import type { Camera } from "../../wire/server";
+
+const kStorageKey = "lookhaven.order";
+/** A pointer that moved less than this has clicked. */
+const kDragPx = 8;
+
+/** In the user's order; cameras that he never moved come after the others, as the server lists them. */
+export function inOwnOrder(cameras: readonly Camera[]): Camera[] {
+  const order = storedOrder();
+  const place = ({ id }: Camera) => (order.includes(id) ? order.indexOf(id) : order.length);
+  return [...cameras].sort((one, other) => place(one) - place(other));
+}
+
+export function keepOrder(ids: readonly number[]): void {
+  localStorage.setItem(kStorageKey, JSON.stringify(ids));
+}
+
+function storedOrder(): number[] {
+  try {
+    const stored: unknown = JSON.parse(localStorage.getItem(kStorageKey) ?? "[]");
+    return Array.isArray(stored) ? stored.filter((id): id is number => typeof id === "number") : [];
+  } catch {
+    return [];
+  }
+}
+
+/**
+ * Lets the mouse drag the children of `grid` to other places; a finger scrolls instead. `moved` is called when one is dropped
+ * elsewhere. The click at the end of a drag is none.
+ */
+export function dragToOrder(grid: HTMLElement, moved: () => void): void {
+  grid.addEventListener("pointerdown", (pressed) => {
+    const tile = (pressed.target as Element).closest<HTMLElement>(".tile");
+    if (!tile || pressed.button !== 0 || pressed.pointerType === "touch") return;
+    const before = [...grid.children];
+    const end = new AbortController();
+    const drag = (event: PointerEvent) => {
+      const isDragged = tile.classList.contains("is-dragged");
+      if (!isDragged && Math.hypot(event.clientX - pressed.clientX, event.clientY - pressed.clientY) < kDragPx) return;
+      tile.classList.add("is-dragged");
+      const over = document.elementFromPoint(event.clientX, event.clientY)?.closest(".tile");
+      if (!over || over === tile || over.parentElement !== grid) return;
+      const tiles = [...grid.children];
+      if (tiles.indexOf(over) > tiles.indexOf(tile)) over.after(tile);
+      else over.before(tile);
+    };
+    const drop = () => {
+      end.abort();
+      if (!tile.classList.contains("is-dragged")) return;
+      tile.classList.remove("is-dragged");
+      const swallow = (click: Event) => {
+        click.preventDefault();
+        click.stopPropagation();
+      };
+      addEventListener("click", swallow, { capture: true, once: true });
+      setTimeout(() => removeEventListener("click", swallow, { capture: true }));
+      if ([...grid.children].some((child, at) => child !== before[at])) moved();
+    };
+    addEventListener("pointermove", drag, { signal: end.signal });
+    for (const type of ["pointerup", "pointercancel", "blur"]) addEventListener(type, drop, { signal: end.signal });
+  });
+}
