@@ -8,21 +8,22 @@ import { keepTrying } from "./screens/keep_trying";
 import { loginScreen } from "./screens/login_screen";
 import { MapsScreen } from "./screens/maps_screen";
 import { followRoute, openScreen } from "./screens/route";
-import type { Screen } from "./screens/screen";
+import type { Kept, Screen } from "./screens/screen";
 import { WallScreen } from "./screens/wall_screen";
 import { AbsentCameras } from "./wall/absent_cameras";
 import { element } from "./widgets/dom";
 import { hideNotice } from "./widgets/notice";
 import { titleScreen } from "./widgets/title";
 
+const keptFor = (userId: number): Kept => ({ userId, absentCameras: new AbsentCameras(), mapDraft: null });
 const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen };
 
 export class App {
   readonly #root: HTMLElement;
   readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
   #account: Account | null = null;
-  /** Of the account that was the last to log in, in whose next session they are still absent. */
-  #absent = { userId: 0, cameras: new AbsentCameras() };
+  /** Of the account that was the last to log in. */
+  #kept = keptFor(0);
   /** Null at the log-in. */
   #screen: Screen | null = null;
 
@@ -59,8 +60,7 @@ export class App {
 
   #showScreens(account: Account): void {
     this.#account = account;
-    const userId = account.user_id;
-    if (this.#absent.userId !== userId) this.#absent = { userId, cameras: new AbsentCameras() };
+    if (this.#kept.userId !== account.user_id) this.#kept = keptFor(account.user_id);
     this.#followRoute();
   }
 
@@ -74,7 +74,7 @@ export class App {
     const session = {
       server: this.#server,
       account: this.#account,
-      absentCameras: this.#absent.cameras,
+      kept: this.#kept,
       onLogOut: () => this.#showLogin(""),
     };
     this.#screen = new kScreens[name](session);

@@ -49,12 +49,13 @@ export class MapEditor {
   #placeable: Placeable[] = [];
   #selected = -1;
 
-  /** `onDone` is called when the user wants to see the map again. */
-  constructor(emaps: Emaps, map: EditedMap, picture: Blob | null, onDone: () => void) {
+  /** `draft` is what an earlier editor of this map left unsaved. `onDone` is called when the user wants to see the map again. */
+  constructor(emaps: Emaps, map: EditedMap, draft: EditedMap | null, picture: Blob | null, onDone: () => void) {
     this.#emaps = emaps;
     this.#onDone = onDone;
     this.#history = new EditHistory(map);
-    this.#revision = map.revision;
+    if (draft) this.#history.add(draft);
+    this.#revision = (draft ?? map).revision;
     this.#view = new MapView<MapItem>({ choose: (view) => this.#select(view), point: () => undefined });
     this.#form = new MapItemForm(
       (item) => this.#change(item),
@@ -79,6 +80,12 @@ export class MapEditor {
 
   get isChanged(): boolean {
     return this.#history.isChanged || this.#form.isTyped;
+  }
+
+  /** The map with all changes, and the revision that they are based on. */
+  get draft(): EditedMap {
+    this.#form.commit();
+    return { ...this.#history.current, revision: this.#revision };
   }
 
   close(): void {

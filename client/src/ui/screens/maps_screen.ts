@@ -16,7 +16,7 @@ import { notify } from "../widgets/notice";
 import { titleScreen } from "../widgets/title";
 import { keepTrying } from "./keep_trying";
 import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
-import { Screen, type Session } from "./screen";
+import { Screen, type Kept, type Session } from "./screen";
 
 const kRefreshMs = 500;
 const kStatesIntervalMs = 3_000;
@@ -39,9 +39,14 @@ export class MapsScreen extends Screen {
   #map: { id: number; content: ViewerMap } | null = null;
   #editor: MapEditor | null = null;
   #loading = new AbortController();
+  /** The user has agreed to lose the changes. */
+  #discards = false;
+
+  readonly #kept: Kept;
 
   constructor(session: Session) {
     super("maps", session);
+    this.#kept = session.kept;
     this.#view = new MapView<ViewerItem>({
       choose: (view, item) => this.#choose(view, item),
       point: (view) => this.#point(view),
@@ -70,6 +75,8 @@ export class MapsScreen extends Screen {
     super.close();
     this.#loading.abort();
     this.#card.hide();
+    // Nobody was asked: the session has ended.
+    if (this.#editor?.isChanged && !this.#discards) this.#kept.mapDraft = this.#editor.draft;
     this.#editor?.close();
     this.#overlay.close();
     this.#view.close();
@@ -77,7 +84,8 @@ export class MapsScreen extends Screen {
 
   /** Asks first where changes would be lost. */
   override canLeave(): boolean {
-    return !this.#editor?.isChanged || confirm("Leave without saving your changes to this map?");
+    if (!this.#editor?.isChanged) return true;
+    return (this.#discards = confirm("Leave without saving your changes to this map?"));
   }
 
   followRoute(): boolean {
@@ -153,6 +161,7 @@ export class MapsScreen extends Screen {
     this.#showStates();
     if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
     void this.#loadStates();
+    if (this.#kept.mapDraft?.id === id) void this.#openEditor();
   }
 
   /** In place of a map. */
@@ -241,7 +250,11 @@ export class MapsScreen extends Screen {
     }
     if (this.#map !== map || this.#editor || this.closed.aborted) return;
     this.#card.hide();
-    this.#editor = new MapEditor(this.#emaps, edited, map.content.picture, () => {
+    const draft = this.#kept.mapDraft?.id === map.id ? this.#kept.mapDraft : null;
+    if (draft) notify("Your changes from before the session ended are here. They are not saved yet.");
+    this.#kept.mapDraft = null;
+    this.#discards = false;
+    this.#editor = new MapEditor(this.#emaps, edited, draft, map.content.picture, () => {
       if (this.#leaveEditor()) void this.#load(map.id);
     });
     this.#view.root.hidden = this.#tools.hidden = true;

@@ -3,6 +3,7 @@
 // What every screen of a logged-in user has: title and heading, the bar with navigation, clock and log-out, the progress
 // line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may leave.
 
+import type { EditedMap } from "../../wire/emaps";
 import type { Account, Server } from "../../wire/server";
 import type { AbsentCameras } from "../wall/absent_cameras";
 import { iconButton } from "../widgets/button";
@@ -19,11 +20,19 @@ import type { ScreenName } from "./route";
 const kClockMs = 500;
 const kNames: Record<ScreenName, string> = { wall: "Live", events: "Events", maps: "Maps" };
 
+/** What the page remembers of an account from one screen or session to the next. */
+export interface Kept {
+  readonly userId: number;
+  readonly absentCameras: AbsentCameras;
+  /** Changes to a map that were not saved when the session ended. */
+  mapDraft: EditedMap | null;
+}
+
 /** What a screen is opened with. */
 export interface Session {
   readonly server: Server;
   readonly account: Account;
-  readonly absentCameras: AbsentCameras;
+  readonly kept: Kept;
   /** Called when the user has logged out. */
   readonly onLogOut: () => void;
 }

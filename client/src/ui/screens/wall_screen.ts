@@ -35,7 +35,7 @@ export class WallScreen extends Screen {
 
   constructor(session: Session) {
     super("wall", session);
-    this.#absent = session.absentCameras;
+    this.#absent = session.kept.absentCameras;
     const actions = { back: showWall, step: (by: 1 | -1) => this.#step(by) };
     this.#overlay = new CameraOverlay(this.server, this.root, this.front, actions);
     this.#grid = new Grid(this.server, {

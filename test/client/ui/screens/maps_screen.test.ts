@@ -43,6 +43,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       const x = await page.locator(".map-editor .map-item").evaluate(({ style }) => style.getPropertyValue("--x"));
       expect([await page.inputValue(".map-names"), x]).toEqual(["1", "6"]);
     }
+    // A session that ends asks nobody.
+    client.server.hasSession = false;
+    await page.keyboard.press("Control+s");
+    await page.getByLabel("Account").fill("x");
+    await page.getByLabel("Password").fill("x");
+    await page.keyboard.press("Enter");
+    await page.locator(".map-editor .map-item[style*='--x: 6']").click();
     const revisions: number[] = [];
     let savedName = "";
     await page.route(/SaveItems/, (route) => {
