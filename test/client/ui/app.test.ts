@@ -73,7 +73,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
 
   const playing = (page: Page, wanted: boolean) => page.waitForSelector(`.transport[data-playing=${wanted}]`);
 
-  test("a click leaves the keys to the screen, Tab gives them to the control", async () => {
+  test("a click leaves the keys to the screen, Tab gives them to the control; the address keeps the picture", async () => {
     const page = await client.open(`${client.address}#event=2`, 1440, 900);
     await playing(page, true);
     await page.click("[aria-label='Next frame']");
@@ -89,6 +89,11 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.keyboard.press("Escape");
     await page.waitForSelector(".day.playing");
     expect(await page.isDisabled("[aria-label='Next month']"), "beyond today").toBe(true);
+    await page.waitForURL(/#event=2&at=\d+$/);
+    const frame = (await page.textContent(".transport-frame"))!;
+    await page.reload();
+    await page.locator(".transport-frame", { hasText: frame }).waitFor();
+    await playing(page, false);
   }, 40_000);
 
   test.each([["#", ".grid"], ["#event=2", ".stage"], ["#camera=1", ".large .picture"]])("full screen of %s is for the pictures", async (hash, picture) => {

@@ -55,6 +55,11 @@ export class Calendar {
     this.refresh();
   }
 
+  /** On any day of the month that is shown. */
+  get hasRecordings(): boolean {
+    return this.#cells.some(({ classList }) => classList.contains("has"));
+  }
+
   /** Marks the day of what is playing, and shows its month when that is another day than before. */
   mark(playingMs: number | null): void {
     const day = playingMs === null ? null : midnight(playingMs);

@@ -206,7 +206,8 @@ export class EventsScreen extends Screen {
     try {
       const footage = await this.#recordings.find(wanted);
       if (this.#opening !== opening) return;
-      if (footage) this.#open(footage);
+      if (footage && wanted.atMs !== null) this.#showPicture(footage, wanted.atMs);
+      else if (footage) this.#open(footage);
       else notify("This recording no longer exists, or you do not have permission to view it.");
     } catch (error) {
       notify(error instanceof ServerError ? error.message : String(error));
@@ -218,6 +219,14 @@ export class EventsScreen extends Screen {
     this.#stage.include(footage.camera);
     this.#timeline.reveal(footage.start * 1000);
     this.#playback.open(footage, footage.start * 1000, isPlaying);
+  }
+
+  /** As a link has it that names the time. */
+  #showPicture(footage: Footage, atMs: number): void {
+    this.#filter.include(footage.camera);
+    this.#stage.include(footage.camera);
+    this.#timeline.reveal(atMs);
+    this.#playback.open(footage, atMs, false);
   }
 
   #seek(atMs: number, camera: number): void {
@@ -270,14 +279,28 @@ export class EventsScreen extends Screen {
     const span = spanText(startMs, Math.min(endMs, Date.now()));
     if (!this.#timeline.showsEvents) return this.#list.show([], span, "Show four days or less to list events.");
     const [fromS, toS] = [startMs / 1000, endMs / 1000];
-    const rows = this.#chosenCameras()
+    const recorded = this.#chosenCameras()
       .flatMap((camera) => this.#cache.get(camera, fromS, toS).footage)
-      .filter((one) => one.stop >= fromS && one.start < toS && this.#filter.kinds.has(kindOf(one)))
+      .filter((one) => one.stop >= fromS && one.start < toS);
+    const rows = recorded
+      .filter((one) => this.#filter.kinds.has(kindOf(one)))
       .sort((one, other) => other.start - one.start || other.id - one.id);
     const head = `${rows.length} ${rows.length === 1 ? "event" : "events"} · ${span}`;
-    const nothing = this.#cache.isBusy ? "" : "No events in this time span. The calendar marks the days with recordings.";
+    const nothing = this.#cache.isBusy ? "" : this.#whyNothing(recorded.length);
     const note = rows.length > kMaxRows ? "Show less time to list older events." : rows.length > 0 ? "" : nothing;
     this.#list.show(rows.slice(0, kMaxRows), head, note);
+  }
+
+  /** Why no event is listed, and what to do about it; `hidden` are there but filtered out. */
+  #whyNothing(hidden: number): string {
+    if (this.#cameras.length === 0) return "";
+    if (this.#chosenCameras().length === 0) return "No camera is chosen. Choose some under “Cameras”.";
+    if (hidden > 0) return `The filter hides ${hidden === 1 ? "one event" : `${hidden} events`}. Choose more kinds to see them.`;
+    if (this.#calendar.hasRecordings) return "No events in this time span. The calendar marks the days with recordings.";
+    return (
+      "Nothing was recorded of these cameras in the month of the calendar. Look at another month or other cameras; " +
+      "a manager starts recording with “lookhaven camera set 1 --record always”."
+    );
   }
 
   /** At most once for each picture of the screen, however many frames the players show. */
@@ -298,11 +321,18 @@ export class EventsScreen extends Screen {
     this.#walk.refresh();
     if (!footage) return;
     this.#opening = "";
-    recordFootage(footage);
+    this.#recordShown();
+  }
+
+  /** Where a picture stands still, the address leads to this one. */
+  #recordShown(): void {
+    const footage = this.#playback.lead?.player.footage;
+    if (footage) recordFootage(footage, this.#playback.isPlaying ? null : this.#playback.playheadMs);
   }
 
   #refresh(): void {
     this.#playback.tick();
+    this.#recordShown();
     const error = this.#error || this.#cache.error;
     const empty = this.#cameras.length === 0 && this.progress.hidden ? "No cameras" : "";
     this.progress.hidden = !this.#cache.isBusy && (this.#cameras.length > 0 || error !== "");

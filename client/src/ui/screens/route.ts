@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
-// there #event=7, #alert=8 or #pos=9; #maps, and there #map=2, and of that map a camera, #map=2&camera=5 or, of the
+// there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps, and there #map=2, and of that map a camera, #map=2&camera=5 or, of the
 // recording server 3, #map=2&camera=5@3.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
@@ -12,7 +12,9 @@ import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps";
 
-const kPattern = /^#(camera|event|alert|pos)=(\d+)$/;
+const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;
+/** Browsers refuse to change the address more often than a few times a second. */
+const kRecordIntervalMs = 500;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?)?$/;
 
 /** What an entry of the browser's history keeps beside its address. */
@@ -69,9 +71,9 @@ function hasOpener(): boolean {
   return (history.state as EntryState | null)?.hasOpener ?? false;
 }
 
-function opened(): { what: string; id: number } | null {
+function opened(): { what: string; id: number; atMs: number | null } | null {
   const found = kPattern.exec(location.hash);
-  return found ? { what: found[1]!, id: Number(found[2]) } : null;
+  return found ? { what: found[1]!, id: Number(found[2]), atMs: found[3] ? Number(found[3]) : null } : null;
 }
 
 export function openScreen(): ScreenName {
@@ -86,10 +88,11 @@ export function openCamera(): number | null {
   return open?.what === "camera" ? open.id : null;
 }
 
-/** What is open on the events' screen. */
-export function openFootage(): FootageRef | null {
+/** What is open on the events' screen; `atMs` is null where no picture of it is named. */
+export function openFootage(): (FootageRef & { atMs: number | null }) | null {
   const open = opened();
-  return open && open.what !== "camera" ? { kind: open.what as FootageRef["kind"], id: open.id } : null;
+  if (!open || open.what === "camera") return null;
+  return { kind: open.what as FootageRef["kind"], id: open.id, atMs: open.atMs };
 }
 
 /** Opens a camera. Going from one camera to the next leaves one entry in the history, not one for each. */
@@ -106,11 +109,20 @@ export function showWall(): void {
   announce();
 }
 
-/** Writes into the address what is being played; as with cameras, all of it is one entry in the history. */
-export function recordFootage({ kind, id }: FootageRef): void {
-  const hash = `#${kind}=${id}`;
-  if (location.hash === hash) return;
-  if (openFootage() === null) push(hash, false);
+let recordedAtMs = 0;
+
+/**
+ * Writes into the address what is being played, and the time of the picture where one stands still (else null); as with
+ * cameras, all of it is one entry in the history. Call it again until the address has it.
+ */
+export function recordFootage({ kind, id }: FootageRef, atMs: number | null): void {
+  // Not rounded down, which would lead to the frame before.
+  const hash = `#${kind}=${id}${atMs === null ? "" : `&at=${Math.ceil(atMs)}`}`;
+  const open = openFootage();
+  const isSame = open?.kind === kind && open.id === id;
+  if (location.hash === hash || (isSame && performance.now() - recordedAtMs < kRecordIntervalMs)) return;
+  recordedAtMs = performance.now();
+  if (open === null) push(hash, false);
   else replace(hash, false);
   shown = currentEntry();
 }
