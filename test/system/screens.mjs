@@ -1,25 +1,27 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // One visit to every screen: what axe-core finds on a desk and on a phone, what the page is called, what has the focus.
-// Pictures of each are taken at all sizes.
+// Pictures of each are taken, at more sizes, where they are kept.
 import { readFileSync } from "node:fs";
 import { createRequire } from "node:module";
 import { address, folder, logIn, report, visit } from "./chromium.mjs";
 
 const axe = readFileSync(createRequire(import.meta.url).resolve("axe-core/axe.min.js"), "utf8");
+const isKept = "LOOKHAVEN_KEEP_SCREENSHOTS" in process.env;
 const sizes = { desk: [1440, 900], laptop: [1024, 768], side: [844, 390], phone: [390, 844] };
 
 await visit(async (page, complaints) => {
   /** Waits for the selector, then looks at what is shown. */
-  const look = async (name, selector) => {
+  const look = async (name, selector, judged = ["desk", "phone"]) => {
     await page.locator(selector).first().waitFor({ timeout: 20_000 });
     const facts = { title: await page.title(), focus: await page.evaluate(() => document.activeElement.textContent) };
     const violations = [];
     for (const [size, [width, height]] of Object.entries(sizes)) {
+      if (!isKept && !judged.includes(size)) continue;
       await page.setViewportSize({ width, height });
-      await page.waitForTimeout(500);
-      await page.screenshot({ path: `${folder}/${name}-${size}.png` });
-      if (size === "laptop" || size === "side") continue;
+      await page.waitForTimeout(300);
+      if (isKept) await page.screenshot({ path: `${folder}/${name}-${size}.png` });
+      if (!judged.includes(size)) continue;
       await page.evaluate(axe);
       const found = (await page.evaluate(() => window.axe.run())).violations;
       violations.push(...found.map(({ id, nodes }) => `${size}: ${id}: ${nodes.map(({ target }) => target).join(" ")}`));
@@ -34,13 +36,13 @@ await visit(async (page, complaints) => {
   await logIn(page);
   await look("wall", '[data-camera="1"][data-state="live"]');
   await page.keyboard.press("?");
-  await look("keys", "dialog[open] kbd");
+  await look("keys", "dialog[open] kbd", ["desk"]);
   await page.keyboard.press("Escape");
   await page.keyboard.press("Tab");
   await go("#camera=1");
   await look("large", '.large[data-state="live"]');
   await page.keyboard.press("s");
-  await look("snapshot", "dialog[open] canvas");
+  await look("snapshot", "dialog[open] canvas", ["desk"]);
   await page.keyboard.press("Escape");
   await go("#events");
   await look("events", ".row");
@@ -49,7 +51,7 @@ await visit(async (page, complaints) => {
   for (const panel of ["Calendar", "Timeline", "Filter"]) {
     await page.setViewportSize({ width: 390, height: 844 });
     await page.getByRole("button", { name: panel, exact: true }).click();
-    await look(panel.toLowerCase(), ".events-body");
+    await look(panel.toLowerCase(), ".events-body", ["phone"]);
   }
   await go("#map=1");
   await look("map", ".map-item");

@@ -50,8 +50,9 @@ export class Tile {
     );
     this.picture.absence = absence;
     this.#open.disabled = absence !== "";
-    this.#open.append(this.picture.root);
     this.#open.addEventListener("click", () => actions.open(camera));
+    // The button lies over the picture, whose messages are not its label.
+    const picture = element("div", { class: "tile-picture" }, this.picture.root, this.#open);
     const bar = element(
       "div",
       { class: "tile-bar" },
@@ -62,7 +63,7 @@ export class Tile {
         ? iconButton("close", `Take ${camera.name} off the wall`, () => actions.dismiss(camera))
         : iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
     );
-    this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, this.#open, bar);
+    this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, picture, bar);
     this.picture.refresh();
   }
 
