@@ -216,6 +216,9 @@ void FrameIndexReader::ReadNew(std::uint64_t recording_bytes, std::vector<FrameE
     if (::fstat(file_.Get(), &status) != 0 || status.st_size > kMaxFileBytes) {
         throw ArchiveError(path_ + " is larger than any frame index");
     }
+    if (entries.empty()) {
+        entries.reserve(static_cast<std::size_t>(status.st_size) / sizeof(RawEntry));
+    }
     std::vector<RawEntry> block(2048);
     bool torn = false;
     for (std::uint64_t at = position_bytes_;;) {

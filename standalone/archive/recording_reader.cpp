@@ -5,6 +5,7 @@
 #include <climits>
 #include <cmath>
 #include <system_error>
+#include <utility>
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -49,7 +50,9 @@ class RecordingReader::Segment {
         if (::fstat(file_.Get(), &status) != 0) {
             base::ThrowErrno("cannot read " + path_.string());
         }
-        for (std::size_t i = ReadNew(static_cast<std::uint64_t>(status.st_size)); i < entries_.size(); ++i) {
+        const std::size_t before = ReadNew(static_cast<std::uint64_t>(status.st_size));
+        waiting_.reserve(waiting_.size() + entries_.size() - before);
+        for (std::size_t i = before; i < entries_.size(); ++i) {
             reorders_ |= entries_[i].time_ms < latest_ms_;
             latest_ms_ = std::max(latest_ms_, entries_[i].time_ms);
             waiting_.push_back(static_cast<std::uint32_t>(i));
@@ -59,6 +62,9 @@ class RecordingReader::Segment {
             std::stable_sort(waiting_.begin(), waiting_.end(), [&](auto a, auto b) { return time(a) < time(b); });
         }
         const std::size_t kept = grows_ && reorders_ ? std::min(kMaxReordered, waiting_.size()) : 0;
+        if (kept == 0) {
+            return std::exchange(waiting_, {});
+        }
         std::vector<std::uint32_t> placed(waiting_.begin(), waiting_.end() - static_cast<std::ptrdiff_t>(kept));
         waiting_.erase(waiting_.begin(), waiting_.begin() + static_cast<std::ptrdiff_t>(placed.size()));
         return placed;
@@ -181,6 +187,9 @@ void RecordingReader::Append(std::uint32_t number) {
     const std::int64_t by_wall_ms = segment.Header().start_wall_ms - start_wall_ms_;
     const std::int64_t base_ms =
         segment.BaseMs(frames_.empty() ? by_wall_ms : std::max(by_wall_ms, frames_.back().time_ms + 1));
+    if (frames_.empty()) {
+        frames_.reserve(entries.size());
+    }
     for (const std::uint32_t entry : entries) {
         const std::int64_t time_ms = segment.Entries()[entry].time_ms;
         const std::int64_t wall_ms = segment.Header().start_wall_ms + time_ms;
