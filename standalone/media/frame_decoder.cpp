@@ -54,7 +54,7 @@ class AvFrameDecoder : public FrameDecoder {
 
     void Restart() override { avcodec_flush_buffers(context_.get()); }
 
-    void Feed(std::span<const std::uint8_t> frame, std::int64_t number) override {
+    void Feed(std::span<const std::uint8_t> frame, std::int64_t number, bool is_wanted) override {
         if (frame.empty()) {
             avcodec_send_packet(context_.get(), nullptr);
             return;
@@ -66,6 +66,7 @@ class AvFrameDecoder : public FrameDecoder {
             ReplaceLengths({packet_->data, frame.size()});
         }
         packet_->pts = number;
+        context_->skip_frame = is_wanted ? AVDISCARD_DEFAULT : AVDISCARD_NONREF;
         avcodec_send_packet(context_.get(), packet_.get());
     }
 

@@ -2,9 +2,12 @@
 #include "standalone/media/libav_libraries.h"
 
 #include <string>
+#include <system_error>
+#include <thread>
 
 #include <dlfcn.h>
 
+#include "standalone/base/blocked_signals.h"
 #include "standalone/media/source.h"
 
 namespace lookhaven::media {
@@ -13,7 +16,8 @@ namespace {
 
 template <class Library>
 const Library& Load(const char* name, const char* function) {
-    void* handle = ::dlopen(name, RTLD_NOW | RTLD_LOCAL);
+    // Of the functions of a hundred libraries few are ever called.
+    void* handle = ::dlopen(name, RTLD_LAZY | RTLD_LOCAL);
     auto* get = handle == nullptr ? nullptr : ::dlsym(handle, function);
     if (get == nullptr) {
         throw SourceError(std::string("cannot load ") + name + ": " + ::dlerror());
@@ -22,6 +26,19 @@ const Library& Load(const char* name, const char* function) {
 }
 
 }  // namespace
+
+void BeginLoadingDecoderLibrary() try {
+    const base::BlockedSignals blocked;
+    std::thread([] {
+        try {
+            LoadDecoderLibrary();
+        } catch (const SourceError&) {
+            // Whoever needs it is told.
+        }
+    }).detach();
+} catch (const std::system_error&) {
+    // No thread to be had: it is loaded when it is needed.
+}
 
 const DecoderLibrary& LoadDecoderLibrary() {
     static const auto& library = Load<DecoderLibrary>("liblookhaven-decoder.so", "LookhavenDecoder");

@@ -29,8 +29,9 @@ class FrameDecoder {
     // Discards all frames fed so far; the next one must be a key frame.
     virtual void Restart() = 0;
     // Feeds the next frame in decoding order, as Annex B or as stored in a Matroska file, with a number that Take will
-    // return. An empty frame means that no more come before Restart. A frame that cannot be decoded is skipped.
-    virtual void Feed(std::span<const std::uint8_t> frame, std::int64_t number) = 0;
+    // return. An empty frame means that no more come before Restart. A frame that cannot be decoded is skipped, and one
+    // that no other is made from, unless its picture is wanted.
+    virtual void Feed(std::span<const std::uint8_t> frame, std::int64_t number, bool is_wanted = true) = 0;
     // The number of the next picture in presentation order; nothing when more frames must be fed first.
     virtual std::optional<std::int64_t> Take() = 0;
     // Encodes the picture last taken into the buffer and returns its size. width: made that wide, unless it is 0 or the
@@ -62,6 +63,8 @@ class RemuxLibrary {
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
 };
 
+// Lets a thread of its own begin to load the decoder library, so that LoadDecoderLibrary waits less. Failures show there.
+void BeginLoadingDecoderLibrary();
 // These load their library for the rest of the process's life. Throw SourceError.
 const DecoderLibrary& LoadDecoderLibrary();
 const RemuxLibrary& LoadRemuxLibrary();

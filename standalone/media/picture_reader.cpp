@@ -84,7 +84,8 @@ void PictureReader::Decode(std::uint32_t entry) {
         if (next_ < entries.size()) {
             bytes_.resize(entries[next_].size);
             recording_.ReadBytes(segment_, entries[next_], bytes_);
-            decoder_->Feed(bytes_, next_++);
+            decoder_->Feed(bytes_, next_, entries[next_].time_ms >= entries[entry].time_ms);
+            ++next_;
         } else {
             decoder_->Feed({}, 0);
             is_inside_ = false;  // drained: the decoder must be restarted
