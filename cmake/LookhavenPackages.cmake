@@ -12,17 +12,16 @@ pkg_check_modules(turbojpeg REQUIRED IMPORTED_TARGET libturbojpeg)
 pkg_check_modules(libav REQUIRED IMPORTED_TARGET libavformat libavcodec libavutil libswscale libswresample)
 find_package(CLI11 REQUIRED)
 
-# Debian's libsoci-dev ships no CMake configuration.
+# Debian's libsoci-dev ships no CMake configuration. The part for PostgreSQL is loaded by its name.
 add_library(lookhaven_soci INTERFACE)
-foreach(part core sqlite3 postgresql)
+foreach(part core sqlite3)
     find_library(SOCI_${part} soci_${part} REQUIRED)
     target_link_libraries(lookhaven_soci INTERFACE ${SOCI_${part}})
 endforeach()
 find_library(SQLITE3 sqlite3 REQUIRED)
 target_link_libraries(lookhaven_soci INTERFACE ${SQLITE3})
 find_path(SOCI_INCLUDE soci/soci.h REQUIRED)
-find_path(LIBPQ_INCLUDE libpq-fe.h PATH_SUFFIXES postgresql REQUIRED)
-target_include_directories(lookhaven_soci SYSTEM INTERFACE ${SOCI_INCLUDE} ${LIBPQ_INCLUDE})
+target_include_directories(lookhaven_soci SYSTEM INTERFACE ${SOCI_INCLUDE})
 if(LOOKHAVEN_SANITIZE MATCHES "undefined")
     # The library hides the type information that this check compares.
     target_compile_options(lookhaven_soci INTERFACE -fno-sanitize=vptr)

@@ -18,6 +18,7 @@
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/http/body.h"
+#include "standalone/store/engine.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/store.h"
 
@@ -196,6 +197,13 @@ std::string ServeOrFail(const Service& service, http::Request& request, control:
 }
 
 }  // namespace
+
+void PrepareToServe(const base::Installation& installation) try {
+    store::PrepareEngine(installation.StoreUrl());
+    SuccessAnswer(Json::Value(Json::objectValue));  // binds what writes answers
+} catch (const std::exception&) {
+    // Opening the store fails likewise.
+}
 
 void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.MustEnd() || slot.player.is_excess; });

@@ -24,6 +24,10 @@ struct Service {
     const http::RequestCounters& counters;
 };
 
+// Loads and binds what every request process would have to. Call it before they are forked. What fails, each of them
+// reports.
+void PrepareToServe(const base::Installation& installation);
+
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down
 // for writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.
 void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot);

@@ -3,9 +3,9 @@
 
 #include <string_view>
 
-#include <soci/postgresql/soci-postgresql.h>
 #include <soci/sqlite3/soci-sqlite3.h>
 
+#include "standalone/store/engine.h"
 #include "standalone/store/text.h"
 #include "standalone/store/users.h"
 
@@ -75,7 +75,7 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
             session_.open(soci::sqlite3, "db=\"" + address.location + "\" timeout=" + kBusyTimeoutS);
             session_ << "pragma foreign_keys = on";
         } else {
-            session_.open(soci::postgresql, WithTimeouts(address.location));
+            session_.open(Postgresql(), WithTimeouts(address.location));
             session_ << "set statement_timeout = '5s'";
         }
     } catch (const soci::soci_error& error) {

@@ -30,8 +30,15 @@ int ReadVersion(Connection& connection) {
                       std::to_string(Store::SchemaVersion()) + ": update Lookhaven on this host");
 }
 
+// Every request opens the store, so it asks for the version first, and whether there is one only where that fails.
+int ReadVersionOfReady(Connection& connection) try {
+    return connection.FetchOne<int>("select version from schema_version").value();
+} catch (const std::exception&) {
+    return ReadVersion(connection);
+}
+
 void CheckVersion(Connection& connection) {
-    const int version = ReadVersion(connection);
+    const int version = ReadVersionOfReady(connection);
     if (version > Store::SchemaVersion()) {
         ThrowNewer(version);
     }

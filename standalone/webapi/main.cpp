@@ -77,6 +77,7 @@ void Run(const Options& options) {
     for (const std::string& module : options.modules) {
         modules.Load(module);
     }
+    api::PrepareToServe(installation);
     base::RaiseDescriptorLimit();  // each running request costs the host two
     host::Listener listener(options.socket.empty() ? installation.WebApiSocket()
                                                    : std::filesystem::path(options.socket));

@@ -266,8 +266,8 @@ class PlaybackTest(unittest.TestCase):
             self.check(numbered(parts, 3), [0, 1, 2])
 
     def test_players_hold_neither_the_store_nor_libraries_that_they_do_not_need(self):
-        def loads_decoder(pid):
-            return "libavcodec" in pathlib.Path(f"/proc/{pid}/maps").read_text()
+        def loads(library, pid):
+            return library in pathlib.Path(f"/proc/{pid}/maps").read_text()
 
         for camera, decodes in ((1, False), (2, True)):
             event = self.finished(camera)
@@ -278,7 +278,7 @@ class PlaybackTest(unittest.TestCase):
                 open_files = [os.readlink(path) for path in pathlib.Path(f"/proc/{player}/fd").iterdir()]
                 self.assertFalse([path for path in open_files if "lookhaven.db" in path])
                 self.assertTrue([path for path in open_files if path.endswith(event["name"])], open_files)
-                self.assertEqual(loads_decoder(player), decodes)
+                self.assertEqual(loads("libavcodec", player), decodes)
                 # The decoder's own.
                 threads = [task for task in pathlib.Path(f"/proc/{player}/task").iterdir() if int(task.name) != player]
                 self.assertEqual(bool(threads), decodes)
@@ -286,7 +286,8 @@ class PlaybackTest(unittest.TestCase):
                     blocked = int(re.search(r"SigBlk:\s(\w+)", (task / "status").read_text())[1], 16)
                     for number in (signal.SIGTERM, signal.SIGUSR1, signal.SIGUSR2):
                         self.assertTrue(blocked >> (number - 1) & 1, "a signal must reach the thread that plays")
-        self.assertFalse(loads_decoder(self.server.part("webapi")), "each fork would pay for it")
+        for library in ("libavcodec", "libpq"):
+            self.assertFalse(loads(library, self.server.part("webapi")), f"each fork would pay for {library}")
 
     def test_a_recording_that_is_deleted_plays_on(self):
         event = self.finished(1)

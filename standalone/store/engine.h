@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a process loads and binds before its first store is open.
+//
+// Why so        The host forks a process for each request, most of which open the store. What they would all load, bind
+//               and set up is done once before. And libpq brings thirty libraries, which would make up half of what
+//               each fork copies, so it is loaded only for a store of PostgreSQL.
+#pragma once
+
+#include <string>
+
+namespace soci {
+class backend_factory;
+}
+
+namespace lookhaven::store {
+
+// Loads the client of PostgreSQL for the rest of the process's life. Throws StoreError.
+const soci::backend_factory& Postgresql();
+
+// For a process that forks those which open the store of that URL. Opens nothing that outlives the call. Throws
+// StoreError.
+void PrepareEngine(const std::string& url);
+
+}  // namespace lookhaven::store
