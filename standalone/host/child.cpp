@@ -52,9 +52,6 @@ void LeaveHost(pid_t host, control::SlotTable& slots, int standard_output) {
     ::dup2(slots.WakeDescriptor(), kWakeDescriptor);
     slots.SetWakeDescriptor(kWakeDescriptor);
     CloseFrom(kWakeDescriptor + 1);
-    for (int number = 1; number < NSIG; ++number) {
-        std::signal(number, SIG_DFL);
-    }
     for (const int number : {SIGPIPE, SIGINT, SIGQUIT, SIGHUP, SIGUSR1, SIGUSR2}) {
         std::signal(number, SIG_IGN);
     }

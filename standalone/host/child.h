@@ -12,8 +12,8 @@
 namespace lookhaven::host {
 
 // Makes a just forked process independent of its host: it dies with the host, keeps of the host's descriptors only 0,
-// 2, what now is 1 (the given one, when not negative) and the table's wake descriptor, and takes signals as a fresh
-// process does, except that it ignores PIPE, INT, QUIT, HUP, USR1 and USR2. Call it with all signals blocked.
+// 2, what now is 1 (the given one, when not negative) and the table's wake descriptor, and takes signals as its host
+// did, except that it ignores PIPE, INT, QUIT, HUP, USR1 and USR2. Call it with all signals blocked.
 void LeaveHost(pid_t host, control::SlotTable& slots, int standard_output);
 
 // Does the work and ends the process. Nothing that the work throws unwinds into the host's code, whose destructors

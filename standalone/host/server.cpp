@@ -41,7 +41,18 @@ bool LooksLikeLogIn(const http::Request& request) {
            request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
 }
 
+// Whoever started this process may have it ignore signals; request processes inherit that.
+void StopIgnoringSignals() {
+    for (int number = 1; number < NSIG; ++number) {
+        struct sigaction inherited {};
+        if (::sigaction(number, nullptr, &inherited) == 0 && inherited.sa_handler == SIG_IGN) {
+            std::signal(number, SIG_DFL);
+        }
+    }
+}
+
 base::FileDescriptor BlockSignals() {
+    StopIgnoringSignals();
     sigset_t all;
     sigfillset(&all);
     ::sigprocmask(SIG_SETMASK, &all, nullptr);
