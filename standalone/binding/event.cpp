@@ -11,6 +11,7 @@
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/control/flush_request.h"
+#include "standalone/media/libav_libraries.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
@@ -107,6 +108,9 @@ int Event::Load(int eventId, int mountId, int serverId, int archiveId) {
         const bool fits = event && serverId == 0 && archiveId == 0 && (mountId == 0 || mountId == event->mount_id);
         if (!fits || !MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
             return -1;
+        }
+        if (event->video_type != base::Codec::kMjpeg) {
+            lookhaven::media::BeginLoadingDecoderLibrary();  // an event is loaded to be played
         }
         *this = lookhaven::binding::PlatformEvent(*event, MountPath(event->mount_id));
         return 0;

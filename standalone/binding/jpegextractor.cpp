@@ -14,6 +14,7 @@
 
 #include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
+#include "standalone/binding/huge_pages.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/media/picture_reader.h"
 
@@ -107,6 +108,7 @@ JpegExtractor::~JpegExtractor() {
 int JpegExtractor::Init(const std::string& path) {
     return OrFailure("JpegExtractor::Init", -1, [&] {
         RequestContext::Current().CloseRecords();
+        lookhaven::binding::PrepareForManyObjects();
         m_pRecording = std::make_unique<Recording>(path);
         return 0;
     });
