@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::chrono::milliseconds kPeriod{500};
 constexpr std::int64_t kPurgePeriodSeconds = 3600;
-constexpr std::int64_t kMinPurgePauseSeconds = 60;  // after a failure; doubles with each in a row
+constexpr std::int64_t kMinPurgePauseSeconds = 60;  // after a failure
 
 void Look(store::Store& records, control::SlotTable& slots, std::int64_t now_s) {
     if (const std::set<std::string> running = slots.Sessions(); !running.empty()) {
@@ -49,20 +49,23 @@ bool TryToPurge(store::Store& records, std::int64_t now_s) {
 void Watch(const base::Installation& installation, control::SlotTable& slots, SessionFilter& filter) {
     store::Store records = store::Store::Open(installation.StoreUrl());
     filter.Learn(store::Sessions(records).Key());
-    std::int64_t due_s = 0;
-    std::int64_t pause_s = kMinPurgePauseSeconds;
+    PurgeSchedule purges;
     for (;; std::this_thread::sleep_for(kPeriod)) {
         const std::int64_t now_s = base::WallSeconds();
         Look(records, slots, now_s);
-        if (now_s >= due_s) {
-            const bool is_purged = TryToPurge(records, now_s);
-            due_s = now_s + (is_purged ? kPurgePeriodSeconds : pause_s);
-            pause_s = is_purged ? kMinPurgePauseSeconds : std::min(2 * pause_s, kPurgePeriodSeconds);
+        // The wall clock may be set back by years.
+        if (const std::int64_t uptime_s = base::MonotonicMicros() / 1'000'000; purges.IsDue(uptime_s)) {
+            purges.NoteAttempt(uptime_s, TryToPurge(records, now_s));
         }
     }
 }
 
 }  // namespace
+
+void PurgeSchedule::NoteAttempt(std::int64_t now_s, bool is_purged) {
+    pause_s_ = is_purged ? 0 : std::clamp(2 * pause_s_, kMinPurgePauseSeconds, kPurgePeriodSeconds);
+    due_s_ = now_s + (is_purged ? kPurgePeriodSeconds : pause_s_);
+}
 
 void WatchSessions(const base::Installation& installation, control::SlotTable& slots, SessionFilter& filter) {
     base::SetLogProgram("session-watcher");
