@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
-// there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps, and there #map=2, and of that map a camera, #map=2&camera=5 or, of the
-// recording server 3, #map=2&camera=5@3.
+// there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps,
+// and there #map=2, and of that map a camera, #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
