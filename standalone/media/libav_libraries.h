@@ -63,7 +63,8 @@ class RemuxLibrary {
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
 };
 
-// Lets a thread of its own begin to load the decoder library, so that LoadDecoderLibrary waits less. Failures show there.
+// Lets a thread of its own begin to load the decoder library, so that LoadDecoderLibrary waits less. What fails shows
+// there.
 void BeginLoadingDecoderLibrary();
 // These load their library for the rest of the process's life. Throw SourceError.
 const DecoderLibrary& LoadDecoderLibrary();
