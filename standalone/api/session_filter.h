@@ -2,8 +2,8 @@
 //
 // Tells invented sessions from real ones before a request has a process, at the cost of a hash.
 //
-// Why so        Whoever invents a cookie would otherwise make the host fork, open the store and read a body of megabytes.
-//               The host itself cannot open the store, so a child that can hands it the key.
+// Why so        Whoever invents a cookie would otherwise make the host fork, open the store and read a body of
+//               megabytes. The host itself cannot open the store, so a child that can hands it the key.
 #pragma once
 
 #include <string>
@@ -23,8 +23,8 @@ class SessionFilter {
     // For the host's child that has opened the store: from now on the host, too, knows the store's session key.
     void Learn(const std::string& key);
 
-    // For the host: whether one of the request's cookies may carry a session's secret. Until the key is known, those that
-    // look like one may. A session that may be one has not been asked for in the store: it may be over.
+    // For the host: whether one of the request's cookies may carry a session's secret. Until the key is known, those
+    // that look like one may. A session that may be one has not been asked for in the store: it may be over.
     bool MayHaveSession(const http::Request& request) const;
 
     // For a request process: from now on nothing here can be reached, by code that a picture has taken over, either.

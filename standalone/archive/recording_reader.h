@@ -53,8 +53,8 @@ class RecordingReader {
     // present rate. A negative index gives the first frame's; 0 when there is no frame.
     std::int64_t TimeOf(int index) const;
 
-    // Wall clock, in milliseconds, at which the frame of a valid index was captured. One that is repeated keeps its own;
-    // otherwise it ascends, unless the clock was set back between two recordings of a span.
+    // Wall clock, in milliseconds, at which the frame of a valid index was captured. One that is repeated keeps its
+    // own; otherwise it ascends, unless the clock was set back between two recordings of a span.
     std::int64_t CapturedMs(int index) const;
 
     // The frame of a valid index. Valid until Refresh.

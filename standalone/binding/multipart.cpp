@@ -39,8 +39,8 @@ void AppendCaptureTime(std::string& head, std::int64_t captured_ms) {
     head.append("\r\n");
 }
 
-// Capture time and age when the data lies in the ring entry that is being read; the capture time when it is the recorded
-// picture that was read last; else nothing.
+// Capture time and age when the data lies in the ring entry that is being read; the capture time when it is the
+// recorded picture that was read last; else nothing.
 void AppendPictureLines(std::string& head, const void* data, const RequestContext& context) {
     const lookhaven::ring::Entry* entry = context.HeldEntry();
     const auto* byte = static_cast<const unsigned char*>(data);

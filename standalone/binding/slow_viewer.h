@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads the live stream of this process at the pace of its viewer's connection: fewer pictures on a slow one, never older.
+// Reads the live stream of this process at the pace of its viewer's connection: fewer pictures on a slow one, never
+// older.
 //
 // Thread safety One thread, and one stream in the process: how far it is behind is kept between the calls.
 #pragma once
@@ -13,8 +14,8 @@ namespace lookhaven::binding {
 const ring::Entry* ReadLatestPicture(void* stream, int last_sequence, ring::Position* position);
 
 // As ring::ReadNext with the sound, for a stream whose pictures build on each other: null while what was sent before is
-// still on its way; where that has made the stream late it goes on at the first key frame that is not. sound: null for a
-// stream that does not wait.
+// still on its way; where that has made the stream late it goes on at the first key frame that is not. sound: null for
+// a stream that does not wait.
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
                                    const ring::SecondReader* sound);
 

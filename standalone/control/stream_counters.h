@@ -22,8 +22,8 @@ namespace lookhaven::control {
 struct StreamCounters {
     LiveStream stream;
     std::uint64_t pictures = 0;
-    std::uint64_t bytes = 0;        // of pictures and sound
-    std::uint64_t connections = 0;  // attempts to reach the camera
+    std::uint64_t bytes = 0;           // of pictures and sound
+    std::uint64_t connections = 0;     // attempts to reach the camera
     std::int64_t last_picture_us = 0;  // when the stream was started, before there is one
 
     // Of its recording, if it is recorded.

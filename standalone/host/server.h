@@ -47,8 +47,9 @@ struct ServerLimits {
 
 class Server {
   public:
-    // Borrows the listener, and closes it when it stops to serve, and the counters. Removes what players of a killed host left in the
-    // installation's folder of progress files. Blocks all signals of the process. Throws std::system_error.
+    // Borrows the listener, and closes it when it stops to serve, and the counters. Removes what players of a killed
+    // host left in the installation's folder of progress files. Blocks all signals of the process. Throws
+    // std::system_error.
     Server(const base::Installation& installation, Callbacks callbacks, Listener& listener,
            http::RequestCounters& counters, const ServerLimits& limits);
 

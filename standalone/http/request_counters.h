@@ -2,8 +2,8 @@
 //
 // Counts the requests that the host has served, and how long they took.
 //
-// Why so        Only the host sees how each request ends, that of a crash too. A request process that is to tell the counts
-//               has a copy of them: that of the moment when it was forked.
+// Why so        Only the host sees how each request ends, that of a crash too. A request process that is to tell the
+//               counts has a copy of them: that of the moment when it was forked.
 #pragma once
 
 #include <array>
@@ -31,8 +31,8 @@ class RequestCounters {
         Durations durations;                     // of those that were no streams
     };
 
-    // call: "VEXO.Event/List", or empty for what named none. It comes from a process that may have been taken over: what
-    // no call is named is counted as none.
+    // call: "VEXO.Event/List", or empty for what named none. It comes from a process that may have been taken over:
+    // what no call is named is counted as none.
     void NoteServed(std::string_view call, int status, bool is_stream, std::chrono::microseconds took);
     // Without a process.
     void NoteRefused(int status) { ++refused_[status]; }

@@ -172,8 +172,8 @@ class Retention {
         return is_in_excess;
     }
 
-    // The age limit. DeleteOldest stops at the first event that is not expired, so the limit must be the same for all of a
-    // mount.
+    // The age limit. DeleteOldest stops at the first event that is not expired, so the limit must be the same for all
+    // of a mount.
     bool IsExpired(const store::Event& event) const {
         return has_age_limit_ && IsOlderThanLimit(mount_, event, now_s_);
     }

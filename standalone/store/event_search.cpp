@@ -33,9 +33,9 @@ std::string EachCameraText(const std::string& condition, const std::string& orde
            condition + ") as found order by camera_id, " + order;
 }
 
-// The rows that meet the condition, camera by camera. Either engine looks each camera up by itself: that way it uses the
-// index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a camera;
-// PostgreSQL, to which a question is a message and an answer, once.
+// The rows that meet the condition, camera by camera. Either engine looks each camera up by itself: that way it uses
+// the index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a
+// camera; PostgreSQL, to which a question is a message and an answer, once.
 template <typename... Parameter>
 void EachCamera(Connection& connection, soci::session& sql, const std::set<int>& camera_ids,
                 const std::string& condition, const std::string& order, const Events::Visitor& visit,

@@ -147,8 +147,8 @@ class Events {
     std::optional<std::string> PathPendingDeletion(int id);
     // Gives the mount's rows of a recorder of an earlier version, which has no order of recording, that of their ids.
     void SetMissingOrders(int mount_id);
-    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far as
-    // dates tell, but not before what precedes it. kOrderOfId when nothing was recorded after it.
+    // The place of a recording whose id says nothing of it: just before what was recorded to the mount after it, as far
+    // as dates tell, but not before what precedes it. kOrderOfId when nothing was recorded after it.
     std::int64_t OrderForDate(int mount_id, std::int64_t start_s);
     // Every row of the mount but demo ones, by camera and id. As Visit.
     void VisitMount(int mount_id, const Visitor& visitor);

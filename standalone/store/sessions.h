@@ -55,8 +55,8 @@ class Sessions {
     // could not end a session that did not exist yet.
     NewSession Create(const VerifiedUser& user, std::int64_t now_s);
 
-    // False for what cannot be a session's secret, without asking the store. With the key, of Key(), only what the store
-    // has once given out can be one.
+    // False for what cannot be a session's secret, without asking the store. With the key, of Key(), only what the
+    // store has once given out can be one.
     static bool MayBeSecret(std::string_view text);
     static bool MayBeSecret(std::string_view text, std::string_view key);
     // The live session of the cookie, whatever bytes the cookie holds; nothing when unknown or expired. One query.
