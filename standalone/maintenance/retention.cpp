@@ -59,7 +59,12 @@ class Retention {
         const std::int64_t allowed_files = watch.files.Allow(lacking_files, room.files, clock_.monotonic_us);
         excess_bytes_ = std::max(BytesAboveLimit(), allowed_bytes);
         excess_files_ = allowed_files;
-        DeleteOldest();
+        std::exception_ptr failure;
+        try {
+            DeleteOldest();
+        } catch (...) {
+            failure = std::current_exception();  // after what has been deleted was noted
+        }
         const Room left = allowed_bytes > 0 || allowed_files > 0 ? MeasureRoom() : Room();
         if (allowed_bytes > 0) {
             watch.bytes.NoteDeleted(deleted_.bytes - finished.bytes, room.bytes, left.bytes, clock_.monotonic_us);
@@ -67,6 +72,9 @@ class Retention {
         if (allowed_files > 0) {
             watch.files.NoteDeleted(kFilesOfEvent * (deleted_.events - finished.events), room.files, left.files,
                                     clock_.monotonic_us);
+        }
+        if (failure) {
+            std::rethrow_exception(failure);
         }
         return deleted_;
     }

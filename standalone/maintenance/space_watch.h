@@ -25,19 +25,22 @@ class SpaceWatch {
     explicit SpaceWatch(bool is_held = false) : is_held_(is_held) {}
 
     // How much of what is lacking may be deleted now; 0 or less is lacking when the disk has room. An attempt after a
-    // pause is the first recording that exceeds nothing: 1.
+    // pause is the first recording that exceeds nothing: 1. Where its space came back, twice as much is allowed each time,
+    // since what came back may be what another program has freed.
     std::int64_t Allow(std::int64_t lacking, std::int64_t room, std::int64_t now_us);
     // After deleting what Allow permitted, with the room before and after.
     void NoteDeleted(std::int64_t deleted, std::int64_t room_before, std::int64_t room_after, std::int64_t now_us);
 
-    // A whole pause has passed, and the space has not come back.
+    // A whole pause has passed, and the space has not come back. Until the disk has room again.
     bool IsHeld() const { return is_held_; }
 
   private:
+    void NoteReturned();
     bool HasReturned(std::int64_t room) const { return deleted_ > 0 && room_ - room <= deleted_ / 2; }
 
-    std::int64_t deleted_ = 0;  // last, while it has not come back
-    std::int64_t room_ = 0;     // before that
+    std::int64_t deleted_ = 0;   // last, while it has not come back
+    std::int64_t room_ = 0;      // before that
+    std::int64_t returned_ = 0;  // what was deleted last, when it has come back
     std::int64_t pause_us_ = 0;
     std::int64_t until_us_ = 0;
     bool is_held_;
