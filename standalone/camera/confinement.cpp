@@ -16,6 +16,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file_descriptor.h"
+#include "standalone/base/process.h"
 #include "standalone/camera/camera_system_calls.h"
 #include "standalone/camera/sanitizers.h"
 
@@ -114,6 +115,7 @@ Confinement ConfineThisProcess() {
     if (::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0 || ::prctl(PR_SET_DUMPABLE, 0, 0, 0, 0) != 0) {
         Fail("cannot give up privileges");
     }
+    base::PreferAsOomVictim();
     LimitResources();
     Confinement confinement;
     confinement.has_landlock = ConfineFiles();

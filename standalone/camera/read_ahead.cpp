@@ -12,6 +12,7 @@
 #include <array>
 #include <cstddef>
 #include <memory>
+#include <new>
 #include <span>
 
 #include <poll.h>
@@ -69,7 +70,11 @@ __attribute__((visibility("default"))) ssize_t recv(int from, void* buffer, size
     }
     if (received->unread.empty()) {
         if (received->bytes == nullptr) {
-            received->bytes = std::make_unique<std::array<std::byte, kBytes>>();
+            received->bytes.reset(new (std::nothrow)
+                                      std::array<std::byte, kBytes>);  // nothing may be thrown through libav
+        }
+        if (received->bytes == nullptr) {
+            return real(from, buffer, size, flags);
         }
         const ssize_t got = real(from, received->bytes->data(), kBytes, 0);
         if (got <= 0) {

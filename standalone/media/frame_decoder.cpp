@@ -66,7 +66,9 @@ class AvFrameDecoder : public FrameDecoder {
             ReplaceLengths({packet_->data, frame.size()});
         }
         packet_->pts = number;
-        context_->skip_frame = is_wanted ? AVDISCARD_DEFAULT : AVDISCARD_NONREF;
+        // In H.265 a picture of a higher temporal layer may build on one that its own layer calls unused.
+        const bool may_skip = !is_wanted && context_->codec_id == AV_CODEC_ID_H264;
+        context_->skip_frame = may_skip ? AVDISCARD_NONREF : AVDISCARD_DEFAULT;
         avcodec_send_packet(context_.get(), packet_.get());
     }
 

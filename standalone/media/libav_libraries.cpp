@@ -32,7 +32,7 @@ void BeginLoadingDecoderLibrary() try {
     std::thread([] {
         try {
             LoadDecoderLibrary();
-        } catch (const SourceError&) {
+        } catch (...) {
             // Whoever needs it is told.
         }
     }).detach();
