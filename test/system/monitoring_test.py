@@ -121,6 +121,7 @@ class MonitoringTest(unittest.TestCase):
             for headers, status in [({}, 200), (proxied, 401), ({**proxied, "Authorization": f"Bearer {token}x"}, 401),
                                     ({**proxied, "Authorization": "Bearer "}, 401), ({**proxied, **bearer}, 200)]:
                 self.assertEqual(self.get(path, headers)[0], status, headers)
+            self.assertEqual(self.get(f"{path}%0a?api=VEXO.System&version=1&method=Health")[0], 404)
         if address := own_address():
             url = f"https://{address}:{self.server.tls_port}/metrics"
             for word, status in ([], "401"), (["-H", f"Authorization: Bearer {token}"], "200"):
