@@ -113,7 +113,8 @@ void Admit(const Call& call, const RequestLimits& limits) {
     control::SlotTable::SetSession(call.slot, call.login->session_handle);
     Occupy(call.slots, call.slot, static_cast<int>(call.login->user_id), limits.per_user,
            call.login->is_manager ? std::numeric_limits<std::size_t>::max() : limits.without_managers);
-    if (CostClassOf(call) == CostClass::kSearch) {
+    const bool decodes_footage = call.api == kPictureApi.name && call.method == "At";
+    if (decodes_footage || CostClassOf(call) == CostClass::kSearch) {
         AwaitSearch(call, limits.searches_per_user);
     }
 }

@@ -126,7 +126,8 @@ std::string LogOut(const Call& call) {
     const binding::Login& login = RequireLogin(call);
     store::Sessions(call.Records()).End(login.session_handle);
     call.slots.EndSession(login.session_handle);
-    return SuccessAnswer(Json::nullValue, CookieLine(call.request, "; Max-Age=0"));
+    // The browser may hold small pictures of footage.
+    return SuccessAnswer(Json::nullValue, CookieLine(call.request, "; Max-Age=0") + "Clear-Site-Data: \"cache\"\r\n");
 }
 
 constexpr Method kMethods[] = {

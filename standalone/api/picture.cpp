@@ -201,7 +201,7 @@ std::string At(const Call& call) {
     if (frame.is_final) {
         // By the cookie, so that nobody gets what another account has looked at in the same browser.
         const std::string tag = '"' + std::to_string(frame.capture_millis) + '-' + std::to_string(width) + '"';
-        cache = "Cache-Control: private, max-age=31536000, immutable\r\nVary: Cookie\r\nETag: " + tag + "\r\n";
+        cache = "Cache-Control: private, max-age=43200, immutable\r\nVary: Cookie\r\nETag: " + tag + "\r\n";
         if (call.request.Header("HTTP_IF_NONE_MATCH") == tag) {
             return "Status: 304 Not Modified\r\n" + cache + "\r\n";
         }

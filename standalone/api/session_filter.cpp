@@ -16,8 +16,13 @@
 namespace lookhaven::api {
 
 struct SessionFilter::Page {
-    std::atomic<bool> is_known;  // set after the key, which stays as it is then
-    std::array<char, store::Sessions::kKeyDigits> key;
+    std::atomic<int> learnt;  // keys; the last of them is in its turn, and the one before stays while it may be read
+    std::array<std::array<char, store::Sessions::kKeyDigits>, 2> keys;
+
+    std::string_view Key() const {
+        const int count = learnt;
+        return count == 0 ? std::string_view() : std::string_view(keys[count % 2U].data(), keys[count % 2U].size());
+    }
 };
 
 SessionFilter::SessionFilter() {
@@ -33,20 +38,19 @@ SessionFilter::~SessionFilter() {
 }
 
 void SessionFilter::Learn(const std::string& key) {
-    if (!page_->is_known && key.size() == page_->key.size()) {
-        std::ranges::copy(key, page_->key.begin());
-        page_->is_known = true;
+    if (page_->Key() != key && key.size() == store::Sessions::kKeyDigits) {
+        std::ranges::copy(key, page_->keys[(page_->learnt + 1) % 2U].begin());
+        ++page_->learnt;
     }
 }
 
 bool SessionFilter::MayHaveSession(const http::Request& request) const {
-    const bool is_known = page_->is_known;
-    const std::string_view key(page_->key.data(), page_->key.size());
+    const std::string_view key = page_->Key();
     const std::string_view cookies = request.Header("HTTP_COOKIE");
     for (std::size_t at = 0; at < cookies.size(); ++at) {
         const std::size_t end = std::min(cookies.find_first_not_of(base::kHexDigits, at), cookies.size());
         const std::string_view text = cookies.substr(at, end - at);
-        if (is_known ? store::Sessions::MayBeSecret(text, key) : store::Sessions::MayBeSecret(text)) {
+        if (key.empty() ? store::Sessions::MayBeSecret(text) : store::Sessions::MayBeSecret(text, key)) {
             return true;
         }
         at = end;

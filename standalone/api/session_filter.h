@@ -20,7 +20,7 @@ class SessionFilter {
     SessionFilter& operator=(const SessionFilter&) = delete;
     ~SessionFilter();
 
-    // For the host's child that has opened the store: from now on the host, too, knows the store's session key.
+    // For the host's child that has opened the store: from now on the host, too, knows the store's session key, which is another one when the store has been replaced.
     void Learn(const std::string& key);
 
     // For the host: whether one of the request's cookies may carry a session's secret. Until the key is known, those

@@ -1,18 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // VEXO.System: how the installation is, for monitors. The web server offers the methods as /healthz and /metrics.
+#include <algorithm>
+#include <array>
+#include <limits>
+
 #include <json/json.h>
 
 #include "standalone/api/health.h"
 #include "standalone/api/metrics.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/base/log.h"
+#include "standalone/base/text.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::api {
 
 namespace {
+
+constexpr int kMonitorUserId = -1;  // all monitors together
+constexpr const char* kNoMonitor = "a monitor asks from this machine, or with the token of lookhaven set monitor-token";
 
 // Null when it cannot be opened, which is what a monitor wants to be told.
 store::Store* TryToOpen(const Call& call) {
@@ -24,28 +32,39 @@ store::Store* TryToOpen(const Call& call) {
     }
 }
 
-// A web server on this machine that speaks for somebody else says so.
+// Over plain HTTP, which only this machine can reach. A proxy on it that speaks for somebody else mostly says so.
 bool IsFromThisMachine(const http::Request& request) {
     const std::string_view address = request.Header("REMOTE_ADDR");
-    return (address.starts_with("127.") || address == "::1") && request.Header("HTTP_X_FORWARDED_FOR").empty() &&
-           request.Header("HTTP_FORWARDED").empty() && request.Header("HTTP_VIA").empty();
+    const bool is_proxied =
+        std::ranges::any_of(std::array{"HTTP_X_FORWARDED_FOR", "HTTP_X_FORWARDED_HOST", "HTTP_X_FORWARDED_PROTO",
+                                       "HTTP_X_REAL_IP", "HTTP_FORWARDED", "HTTP_VIA"},
+                            [&](const char* name) { return !request.Header(name).empty(); });
+    return (address.starts_with("127.") || address == "::1") && request.Header("HTTPS") != "on" && !is_proxied;
 }
 
-bool HasToken(const Call& call, store::Store* records) {
-    constexpr std::string_view kScheme = "Bearer ";
-    const std::string_view authorization = call.request.Header("HTTP_AUTHORIZATION");
-    if (records == nullptr || !authorization.starts_with(kScheme)) {
-        return false;
-    }
-    const auto digest = store::Settings(*records).Find(store::kMonitorTokenSetting);
-    return digest && *digest == store::Digest(authorization.substr(kScheme.size()));
+bool IsToken(store::Store& records, std::string_view token) {
+    const auto digest = store::Settings(records).Find(store::kMonitorTokenSetting);
+    return digest && *digest == store::Digest(token);
 }
 
-// Throws Failure 401 for anybody else. The store, as TryToOpen gives it.
+// Throws Failure 401 for anybody who is no monitor, 503 when too many are asking. The store, as TryToOpen gives it. What can
+// be refused without the store is.
 store::Store* AdmitMonitor(const Call& call) {
+    constexpr std::string_view kScheme = "Bearer ";
+    constexpr std::size_t kMaxMonitors = 4;
+    const bool is_from_here = IsFromThisMachine(call.request);
+    std::string_view token = call.request.Header("HTTP_AUTHORIZATION");
+    token.remove_prefix(token.starts_with(kScheme) ? kScheme.size() : token.size());
+    if (!is_from_here && !base::IsHex(token, store::kMonitorTokenDigits)) {
+        throw Failure(401, kNoMonitor);
+    }
+    if (call.slots.Admit(call.slot, kMonitorUserId, kMaxMonitors, std::numeric_limits<std::size_t>::max()) !=
+        control::Admission::kGranted) {
+        throw Failure(503, "too many monitors are asking", http::kRetrySoonSeconds);
+    }
     store::Store* const records = TryToOpen(call);
-    if (!IsFromThisMachine(call.request) && !HasToken(call, records)) {
-        throw Failure(401, "a monitor asks from this machine, or with the token of lookhaven set monitor-token");
+    if (!is_from_here && (records == nullptr || !IsToken(*records, token))) {
+        throw Failure(401, kNoMonitor);
     }
     return records;
 }

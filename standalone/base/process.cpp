@@ -64,4 +64,9 @@ void RaiseDescriptorLimit() {
     }
 }
 
+void PreferAsOomVictim() {
+    const FileDescriptor file(::open("/proc/self/oom_score_adj", O_WRONLY | O_CLOEXEC));
+    [[maybe_unused]] const ssize_t written = file ? ::write(file.Get(), "500", 3) : 0;
+}
+
 }  // namespace lookhaven::base

@@ -67,9 +67,8 @@ void SetCms(const Console& console, const Request& request) {
 }
 
 void SetMonitorToken(const Console& console, const Request& request) {
-    constexpr std::size_t kTokenBytes = 24;
     const bool is_new = request.word == "new";
-    const std::string token = is_new ? store::RandomHex(kTokenBytes) : "";
+    const std::string token = is_new ? store::RandomHex(store::kMonitorTokenDigits / 2) : "";
     store::Store store = console.OpenStore();
     store::Settings(store).Set(store::kMonitorTokenSetting, is_new ? store::Digest(token) : "");
     console.Answer(Object("token", token), is_new ? token : "Monitors on other machines are refused.");

@@ -242,7 +242,12 @@ std::string_view SessionOf(const Slot& slot) {
 }
 
 std::string_view CallOf(const Slot& slot) {
-    return slot.has_call ? TextIn(slot.call) : std::string_view{};
+    const std::string_view call = slot.has_call ? TextIn(slot.call) : std::string_view{};
+    // The slot is its process's to write.
+    const bool is_name = std::ranges::all_of(call, [](char c) {
+        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '/';
+    });
+    return is_name ? call : std::string_view{};
 }
 
 }  // namespace lookhaven::control

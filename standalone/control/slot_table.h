@@ -187,7 +187,7 @@ class SlotTable {
 
 // The session that the slot names; empty when none.
 std::string_view SessionOf(const Slot& slot);
-// What it serves; empty while that is not known.
+// What it serves; empty while that is not known, or is no call's name.
 std::string_view CallOf(const Slot& slot);
 
 }  // namespace lookhaven::control

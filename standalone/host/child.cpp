@@ -13,6 +13,7 @@
 #include <unistd.h>
 
 #include "standalone/base/log.h"
+#include "standalone/base/process.h"
 
 namespace lookhaven::host {
 
@@ -49,6 +50,7 @@ void LeaveHost(pid_t host, control::SlotTable& slots, int standard_output) {
     if (standard_output >= 0) {
         ::dup2(standard_output, STDOUT_FILENO);
     }
+    base::PreferAsOomVictim();
     ::dup2(slots.WakeDescriptor(), kWakeDescriptor);
     slots.SetWakeDescriptor(kWakeDescriptor);
     CloseFrom(kWakeDescriptor + 1);

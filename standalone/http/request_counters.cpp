@@ -5,22 +5,11 @@
 
 namespace lookhaven::http {
 
-namespace {
-
-bool IsCallName(std::string_view text) {
-    return std::ranges::all_of(text, [](char c) {
-        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '/';
-    });
-}
-
-}  // namespace
-
 RequestCounters::Call& RequestCounters::Find(std::string_view call) {
     if (const auto known = calls_.find(call); known != calls_.end()) {
         return known->second;
     }
-    const bool is_new_name = IsCallName(call) && calls_.size() < kMaxCalls;
-    return calls_[is_new_name ? std::string(call) : std::string()];
+    return calls_[calls_.size() < kMaxCalls ? std::string(call) : std::string()];
 }
 
 void RequestCounters::NoteServed(std::string_view call, int status, bool is_stream, std::chrono::microseconds took) {

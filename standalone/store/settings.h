@@ -3,6 +3,7 @@
 // Settings by name, and the revision by which others notice a change cheaply.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -14,6 +15,7 @@ namespace lookhaven::store {
 
 // Its value is the digest of a token with which a monitor on another machine may ask for health and metrics.
 constexpr const char* kMonitorTokenSetting = "monitor_token";
+constexpr std::size_t kMonitorTokenDigits = 48;  // hexadecimal
 
 class Settings {
   public:
