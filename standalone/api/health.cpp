@@ -42,7 +42,7 @@ void CheckCameras(store::Store& records, const std::vector<control::StreamCounte
             return each.is_recorded && each.stream.camera == camera.id;
         });
         if (camera.enabled && plan != plans.end() && plan->second.mode == store::RecordMode::kAlways && !is_recorded) {
-            problems.push_back({"camera", camera.id, "it is to be recorded, and is not"});
+            problems.push_back({"camera", camera.id, "it should be recorded, but is not"});
         }
     }
 }

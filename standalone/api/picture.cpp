@@ -90,7 +90,7 @@ std::string ImageAnswer(const std::vector<std::uint8_t>& jpeg, std::int64_t capt
     return answer.append(reinterpret_cast<const char*>(jpeg.data()), jpeg.size());
 }
 
-constexpr const char* kKeepNot = "Cache-Control: no-store\r\n";
+constexpr const char* kNoStore = "Cache-Control: no-store\r\n";
 
 std::string Get(const Call& call) {
     const int id = call.Parameter("camera").asInt();
@@ -109,7 +109,7 @@ std::string Get(const Call& call) {
         throw Failure(504, "no picture came");
     }
     const std::int64_t captured = frame->capture_millis;
-    return ImageAnswer(Jpeg(call, *std::move(frame)), captured, kKeepNot);
+    return ImageAnswer(Jpeg(call, *std::move(frame)), captured, kNoStore);
 }
 
 // The footage that was asked for: of an event, or of what the camera recorded last at or before the time.
@@ -197,7 +197,7 @@ std::string At(const Call& call) {
         throw Failure(400, "width is out of its bounds");
     }
     RecordedKeyFrame frame = KeyFrameOf(call);
-    std::string cache = kKeepNot;
+    std::string cache = kNoStore;
     if (frame.is_final) {
         // By the cookie, so that nobody gets what another account has looked at in the same browser.
         const std::string tag = '"' + std::to_string(frame.capture_millis) + '-' + std::to_string(width) + '"';

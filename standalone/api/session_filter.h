@@ -20,11 +20,12 @@ class SessionFilter {
     SessionFilter& operator=(const SessionFilter&) = delete;
     ~SessionFilter();
 
-    // For the host's child that has opened the store: from now on the host, too, knows the store's session key, which is another one when the store has been replaced.
+    // For the host's child that has opened the store: tells the host the store's session key. Call it again when the
+    // store has been replaced, which gives it another key.
     void Learn(const std::string& key);
 
-    // For the host: whether one of the request's cookies may carry a session's secret. Until the key is known, those
-    // that look like one may. A session that may be one has not been asked for in the store: it may be over.
+    // False: no cookie carries a secret of this store, so there is no session. True says only that one may exist; it may
+    // have ended. Until the key is known, any well-formed secret counts.
     bool MayHaveSession(const http::Request& request) const;
 
     // For a request process: from now on nothing here can be reached, by code that a picture has taken over, either.

@@ -20,7 +20,7 @@ namespace lookhaven::api {
 namespace {
 
 constexpr int kMonitorUserId = -1;  // all monitors together
-constexpr const char* kNoMonitor = "a monitor asks from this machine, or with the token of lookhaven set monitor-token";
+constexpr const char* kNoMonitor = "monitors must run on this machine or send the token of lookhaven set monitor-token";
 
 // Null when it cannot be opened, which is what a monitor wants to be told.
 store::Store* TryToOpen(const Call& call) {
@@ -47,8 +47,8 @@ bool IsToken(store::Store& records, std::string_view token) {
     return digest && *digest == store::Digest(token);
 }
 
-// Throws Failure 401 for anybody who is no monitor, 503 when too many are asking. The store, as TryToOpen gives it. What can
-// be refused without the store is.
+// Returns the store as TryToOpen gives it. Throws Failure 401 for a caller that is no monitor, 503 when too many are
+// asking. What can be refused without opening the store is refused before.
 store::Store* AdmitMonitor(const Call& call) {
     constexpr std::string_view kScheme = "Bearer ";
     constexpr std::size_t kMaxMonitors = 4;

@@ -32,8 +32,8 @@ bool IsAlive(const ProcessIdentity& process);
 // Lets the calling process open as many descriptors as the system ever grants it.
 void RaiseDescriptorLimit();
 
-// Where memory runs out, the kernel ends this process before one that many others depend on. Does nothing where /proc cannot
-// be written.
+// When memory runs out, the kernel ends this process before others that more depend on. Does nothing where /proc
+// cannot be written.
 void PreferAsOomVictim();
 
 }  // namespace lookhaven::base

@@ -10,17 +10,17 @@
 
 namespace lookhaven::binding {
 
-// As ring::ReadLatest, after what was sent before has left, or a picture is overdue. A hundred milliseconds at most.
+// As ring::ReadLatest, but first waits until the last picture has been sent or another is overdue, at most 100 ms.
 const ring::Entry* ReadLatestPicture(void* stream, int last_sequence, ring::Position* position);
 
-// As ring::ReadNext with the sound, for a stream whose pictures build on each other: null while what was sent before is
-// still on its way; where that has made the stream late it goes on at the first key frame that is not. sound: null for
-// a stream that does not wait.
+// As ring::ReadNext for video whose frames depend on each other. Null while what was sent before is still on its way.
+// Where that has made the stream late, it resumes at the first key frame that is not. sound: null for a stream that
+// does not wait.
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
                                    const ring::SecondReader* sound);
 
-// As ring::ReadNext for that stream's sound, which would fill the connection that the pictures wait for. It waits too,
-// and goes on with the newest where that made it late.
+// As ring::ReadNext for sound, which would fill the connection that the pictures wait for. It waits likewise, and
+// resumes at the newest where that made it late.
 const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position* position);
 
 }  // namespace lookhaven::binding

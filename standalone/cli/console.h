@@ -27,7 +27,7 @@ enum ExitCode : int {
     kOsError = 71,
     kCannotCreate = 73,
     kNoPermission = 77,
-    kConfigError = 78,  // the store's schema is not this program's
+    kConfigError = 78,  // store's schema or settings file not valid for this program
 };
 
 // The texts and numbers in a row.

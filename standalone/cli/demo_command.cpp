@@ -104,7 +104,7 @@ void AddDemo(CLI::App& program, const Console& console) {
               "Adds four cameras, two of them recorded, e-maps, and the account viewer; prompts for its password",
               SetUp);
     group.Add("footage", "Records some scenes of the last days, with alerts and POS transactions", RecordFootage);
-    group.Add("remove", "Removes what setup, footage and events added, but the account", Remove);
+    group.Add("remove", "Removes what setup, footage and events added, except the account", Remove);
     group.Add("events", "Generates events without footage, or removes them", GenerateEvents)
         .Option("--count", request.count, "Number of events", Satisfies(CLI::Range(1, 100'000'000)))
         .Option("--days", request.days, "Spread them over this many days up to now (default: 30)",

@@ -238,7 +238,7 @@ void AddServer(CLI::App& program, const Console& console) {
              Add)
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "The other host's address (default: as in the line)");
-    group.Add("set", "Changes where a host is reached, or what it is called, without pairing anew", Change)
+    group.Add("set", "Changes where a host is reached, or what it is called, without pairing again", Change)
         .Option("id", request.id, "The host's id", Required)
         .Option("--name", request.change.name, name)
         .Option("--address", request.change.address, "Its address")

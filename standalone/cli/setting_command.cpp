@@ -76,7 +76,7 @@ void SetMonitorToken(const Console& console, const Request& request) {
 
 void Check(const Console& console, const CheckRequest& request) {
     CheckSettingsFile(request.file);
-    console.Answer(Object("file", request.file), "The settings in ", request.file, " are right.");
+    console.Answer(Object("file", request.file), "The settings in ", request.file, " are valid.");
 }
 
 }  // namespace
@@ -93,10 +93,11 @@ void AddSetting(CLI::App& program, const Console& console) {
                 [&setting](const Console& shown_on, const Request& given) { Set(shown_on, setting, given.value); })
             .Option("value", set.request().value, "", Required, Satisfies(CLI::Range(setting.min, setting.max)));
     }
-    CommandGroup<Request> role(program, console, "set", "The role of this host");
+    CommandGroup<Request> role(program, console, "set", "The role of this host, and the monitors' token");
     role.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
         .Option("value", role.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
-    role.Add("monitor-token", "With it a monitor on another machine may ask for /healthz and /metrics", SetMonitorToken)
+    role.Add("monitor-token", "Token that lets a monitor on another machine read /healthz and /metrics",
+             SetMonitorToken)
         .Option("value", role.request().word, "new: replaces it and prints it, once; off: removes it", Required,
                 Satisfies(CLI::IsMember({"new", "off"})));
 }

@@ -24,14 +24,14 @@ class SpaceWatch {
     // is_held: as a watch told before this one.
     explicit SpaceWatch(bool is_held = false) : is_held_(is_held) {}
 
-    // How much of what is lacking may be deleted now; 0 or less is lacking when the disk has room. An attempt after a
-    // pause is the first recording that exceeds nothing: 1. Where its space came back, twice as much is allowed each time,
-    // since what came back may be what another program has freed.
+    // How much of what is lacking may be deleted now; 0 or less is lacking when the disk has room. After a pause one
+    // recording is tried: 1 is returned. If its space came back, twice the amount last returned is allowed next, since
+    // another program may have freed it.
     std::int64_t Allow(std::int64_t lacking, std::int64_t room, std::int64_t now_us);
     // After deleting what Allow permitted, with the room before and after.
     void NoteDeleted(std::int64_t deleted, std::int64_t room_before, std::int64_t room_after, std::int64_t now_us);
 
-    // A whole pause has passed, and the space has not come back. Until the disk has room again.
+    // Deleting freed no space, and a whole pause has passed since. True until nothing is lacking.
     bool IsHeld() const { return is_held_; }
 
   private:

@@ -33,11 +33,11 @@ void BeginLoadingDecoderLibrary() try {
         try {
             LoadDecoderLibrary();
         } catch (...) {
-            // Whoever needs it is told.
+            // LoadDecoderLibrary reports it.
         }
     }).detach();
 } catch (const std::system_error&) {
-    // No thread to be had: it is loaded when it is needed.
+    // Without a thread it is loaded when needed.
 }
 
 const DecoderLibrary& LoadDecoderLibrary() {

@@ -127,7 +127,6 @@ export class EventList {
     const still = element("img", { class: "row-still", alt: "" });
     const button = element("button", { type: "button", class: "row-open" }, ...parts, still);
     const row = element("div", { class: "row", role: "listitem", "data-ref": `${one.kind}${one.id}` }, button);
-    if (one.isSaved) this.#stills.load(still, this.#stillAddress(one, kStillPx));
     button.addEventListener("click", () => {
       const one = this.#footage[Number(row.dataset["at"])];
       if (one) this.#onOpen(one);
@@ -151,6 +150,11 @@ export class EventList {
     button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
     button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describeMark(one)].filter(Boolean).join("\n");
     button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
+    // A mark's footage may come later than its row.
+    if (one.isSaved && !row.dataset["still"]) {
+      row.dataset["still"] = "asked";
+      this.#stills.load(button.querySelector("img")!, this.#stillAddress(one, kStillPx));
+    }
   }
 
   #key(event: KeyboardEvent): void {
