@@ -16,12 +16,13 @@
 namespace lookhaven::api {
 
 struct SessionFilter::Page {
-    std::atomic<int> learnt;  // keys; the last of them is in its turn, and the one before stays while it may be read
+    std::atomic<unsigned int>
+        learnt;  // keys; the last of them is in its turn, and the one before stays while it may be read
     std::array<std::array<char, store::Sessions::kKeyDigits>, 2> keys;
 
     std::string_view Key() const {
-        const int count = learnt;
-        return count == 0 ? std::string_view() : std::string_view(keys[count % 2U].data(), keys[count % 2U].size());
+        const unsigned int count = learnt;
+        return count == 0 ? std::string_view() : std::string_view(keys[count % 2].data(), keys[count % 2].size());
     }
 };
 
@@ -39,7 +40,7 @@ SessionFilter::~SessionFilter() {
 
 void SessionFilter::Learn(const std::string& key) {
     if (page_->Key() != key && key.size() == store::Sessions::kKeyDigits) {
-        std::ranges::copy(key, page_->keys[(page_->learnt + 1) % 2U].begin());
+        std::ranges::copy(key, page_->keys[(page_->learnt + 1) % 2].begin());
         ++page_->learnt;
     }
 }

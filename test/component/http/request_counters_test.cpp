@@ -28,7 +28,7 @@ TEST(RequestCounters, PutsEachRequestInItsBucketAndLeavesStreamsOut) {
     EXPECT_EQ(counts[1], 1U);
     EXPECT_EQ(counts[12], 1U);
     EXPECT_EQ(counts[13], 1U) << "beyond the last bound";
-    EXPECT_EQ(std::accumulate(counts.begin(), counts.end(), 0U), 5U);
+    EXPECT_EQ(std::accumulate(counts.begin(), counts.end(), std::uint64_t{0}), 5U);
     EXPECT_NEAR(call.durations.sum_s, 20.002, 0.001);
 }
 

@@ -31,10 +31,8 @@ Picture Read(PictureReader& reader, int index) {
 
 std::vector<Picture> ReadAll(const archive::RecordingReader& recording) {
     PictureReader reader(recording);
-    std::vector<Picture> pictures;
-    for (int i = 0; i < recording.FrameCount(); ++i) {
-        pictures.push_back(Read(reader, i));
-    }
+    std::vector<Picture> pictures(static_cast<std::size_t>(recording.FrameCount()));
+    std::ranges::generate(pictures, [&, i = 0]() mutable { return Read(reader, i++); });
     return pictures;
 }
 
