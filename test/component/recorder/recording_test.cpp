@@ -158,6 +158,8 @@ TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
         const int camera = AddCamera("test:mjpeg?size=160x120&fps=25");
         SetPlan(camera, mode);
         const Child recorder = StartRecorder();
+        const std::string live = "camera " + std::to_string(camera) + " \"Camera\" stream 0: live";
+        ASSERT_TRUE(Eventually([&] { return Log().find(live) != std::string::npos; })) << Log();
         if (mode == store::RecordMode::kAlways) {
             ASSERT_TRUE(Eventually([&] { return !EventsOf(camera).empty(); })) << Log();
         }
