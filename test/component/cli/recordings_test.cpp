@@ -25,7 +25,6 @@ namespace lookhaven::cli {
 namespace {
 
 using testing::ElementsAre;
-using testing::HasSubstr;
 
 constexpr std::int64_t kStart = 1'772'352'900;  // 2026-03-01T08:15:00Z
 
@@ -160,7 +159,7 @@ TEST_F(RecordingsTest, MountsAreAddedChangedAndForgotten) {
     const std::string disk = (folder_ / "disk").string();
     std::filesystem::create_directories(disk);
     std::filesystem::create_symlink(disk, folder_ / "link");
-    std::ofstream(folder_ / "file");
+    const std::ofstream file(folder_ / "file");
     Play({{"mount add " + (folder_ / "none").string(), 66, "no folder"},
           {"mount add " + (folder_ / "file").string(), 66, "no folder"},
           {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "Added mount disk with id"},
