@@ -20,6 +20,7 @@ constexpr std::int64_t kFarFuture = 4'000'000'000'000;  // whoever waits for the
 
 std::vector<std::int64_t> Times(const RecordingReader& recording) {
     std::vector<std::int64_t> times;
+    times.reserve(static_cast<std::size_t>(recording.FrameCount()));
     for (int i = 0; i < recording.FrameCount(); ++i) {
         times.push_back(recording.At(i).time_ms);
     }
