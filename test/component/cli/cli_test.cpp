@@ -96,8 +96,8 @@ TEST_F(CliTest, SetUpIsRepeatableAndKeepsWhatIsThere) {
 TEST_F(CliTest, AFileOfSettingsIsRightOrSaysInWhichLineItIsNot) {
     const auto file = folder_ / "lookhaven.conf";
     const std::tuple<const char*, int, const char*> rows[] = {
-        {"", 0, "are right"},
-        {"# a comment\n\nLOOKHAVEN_PORT=8081\nLOOKHAVEN_TLS_PORT = \"8444\"\n", 0, "are right"},
+        {"", 0, "are valid"},
+        {"# a comment\n\nLOOKHAVEN_PORT=8081\nLOOKHAVEN_TLS_PORT = \"8444\"\n", 0, "are valid"},
         {"# a comment\nLOOKHAVEN_PROT=8081\n", 78,
          "line 2: there is no setting LOOKHAVEN_PROT; did you mean LOOKHAVEN_PORT?"},
         {"LOOKHAVEN_TLSPORT=1\n", 78, "did you mean LOOKHAVEN_TLS_PORT?"},
@@ -109,7 +109,7 @@ TEST_F(CliTest, AFileOfSettingsIsRightOrSaysInWhichLineItIsNot) {
         base::WriteFileAtomically(file, text);
         Play({{"setting check " + file.string(), code, has}});
     }
-    Play({{"setting check " + (folder_ / "none").string(), 0, "are right"}});
+    Play({{"setting check " + (folder_ / "none").string(), 0, "are valid"}});
 }
 
 TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {

@@ -60,6 +60,13 @@ export class Calendar {
     return this.#cells.some(({ classList }) => classList.contains("has"));
   }
 
+  /** Of some day of the month that is shown it is not known yet. */
+  get isLoading(): boolean {
+    const cameras = this.#cameras();
+    const days = this.#cells.filter(({ disabled }) => !disabled).map(({ dataset }) => Number(dataset["day"]));
+    return days.some((day) => cameras.some((camera) => this.#days.has(camera, day) === undefined));
+  }
+
   /** Marks the day of what is playing, and shows its month when that is another day than before. */
   mark(playingMs: number | null): void {
     const day = playingMs === null ? null : midnight(playingMs);

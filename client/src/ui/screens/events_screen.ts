@@ -239,8 +239,8 @@ export class EventsScreen extends Screen {
     if (this.#stage.cameras.length === 0 && lanes[0]) return this.#stage.show([lanes[0].id]);
     this.#timeline.setKinds(this.#filter.kinds);
     this.#timeline.setLanes(lanes.map(({ id, name }) => ({ camera: id, name })), this.#stage.cameras);
-    this.#calendar.refresh();
-    this.#showFootage();
+    // On a phone the timeline may be out of sight, and then tells of no span that has to be loaded.
+    this.#reload();
   }
 
   #pickDay(dayMs: number): void {
@@ -270,7 +270,7 @@ export class EventsScreen extends Screen {
 
   #showDays(): void {
     this.#calendar.refresh();
-    this.#timeline.redraw();
+    this.#showFootage();
   }
 
   #showFootage(): void {
@@ -296,6 +296,7 @@ export class EventsScreen extends Screen {
     if (this.#cameras.length === 0) return "";
     if (this.#chosenCameras().length === 0) return "No camera is chosen. Choose some under “Cameras”.";
     if (hidden > 0) return `The filter hides ${hidden === 1 ? "one event" : `${hidden} events`}. Choose more kinds to see them.`;
+    if (this.#calendar.isLoading) return "";
     if (this.#calendar.hasRecordings) return "No events in this time span. The calendar marks the days with recordings.";
     return (
       "Nothing was recorded of these cameras in the month of the calendar. Look at another month or other cameras; " +

@@ -147,4 +147,12 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.evaluate(smallControls, "button:not(.day), a, summary, select")).toEqual([]);
     expect(await page.evaluate(() => document.documentElement.scrollWidth)).toBe(390);
   }, 40_000);
+
+  test("a phone, too, says that there is nothing only once it knows", async () => {
+    const page = await opened("#events", 390, 844);
+    const note = await page.waitForFunction(() => document.querySelector(".list-note")?.textContent);
+    const first = new Date(new Date().setDate(1));
+    const isOnCalendar = noon * 1000 >= first.setDate(1 - ((first.getDay() + 6) % 7));
+    expect(await note.jsonValue()).toMatch(isOnCalendar ? /^No events in this time span/ : /^Nothing was recorded/);
+  }, 40_000);
 });
