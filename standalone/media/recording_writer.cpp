@@ -127,7 +127,10 @@ void RecordingWriter::Flush() {
 }
 
 void RecordingWriter::Close() {
-    if (!has_failed_) {
+    if (is_finished_) {
+        return;
+    }
+    if (!has_failed_ && output_ != nullptr) {
         Flush();
         try {
             output_->End();
@@ -137,6 +140,7 @@ void RecordingWriter::Close() {
             base::LogWarning(path_ + " ends without a seek table: " + error.what());
             has_failed_ = true;
         }
+        output_.reset();  // it cannot be ended twice
     }
     OnDisk([&] {
         if (has_failed_ && ::ftruncate(file_.Get(), static_cast<off_t>(end_bytes_)) != 0) {
@@ -144,6 +148,7 @@ void RecordingWriter::Close() {
         }
         index_->Finish();
     });
+    is_finished_ = true;
 }
 
 template <class Step>

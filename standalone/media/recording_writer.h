@@ -57,7 +57,8 @@ class RecordingWriter {
     void Flush();
 
     // Flushes, writes what makes the file seekable for other programs, and marks the index finished. After a WriteError
-    // it cuts off what is not whole and marks the index finished. Throws WriteError when that fails.
+    // it cuts off what is not whole and marks the index finished. Throws WriteError when that fails; it may be called
+    // again then, as it may after it succeeded.
     void Close();
 
     // Of what was flushed.
@@ -87,6 +88,7 @@ class RecordingWriter {
     std::int64_t flushed_us_;
     bool is_pending_ = false;
     bool has_failed_ = false;
+    bool is_finished_ = false;
     int frame_count_ = 0;
     std::int64_t latest_ms_ = 0;
     std::uint64_t end_bytes_ = 0;  // of the last whole cluster

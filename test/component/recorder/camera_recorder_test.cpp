@@ -86,6 +86,21 @@ class CameraRecorderTest : public testing::Test {
         std::make_shared<media::MediaFormat>(media::MediaFormat{clip_.format.video, {}});
 };
 
+TEST_F(CameraRecorderTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsEndAlone) {
+    OpenStore();
+    Pass(2.48);
+    fs::rename(MountPath(1), folder_ / "away");
+    recorder_.Close();
+    EXPECT_EQ(recorder_.OpenEvent(), 0);
+    EXPECT_EQ(recorder_.State(), RecordingState::kDiskFails);
+    fs::rename(folder_ / "away", MountPath(1));
+    Pass(3);
+    recorder_.Close();
+    ASSERT_EQ(Files().size(), 2U);
+    EXPECT_GE(archive::RecordingReader(Files().front()).FrameCount(), 60) << "it was on the disk";
+    EXPECT_EQ(recorder_.State(), RecordingState::kReady);
+}
+
 TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
     OpenStore();
     struct Row {
