@@ -5,7 +5,7 @@
 #include <string>
 
 #include "standalone/base/log.h"
-#include "standalone/maintenance/retention.h"
+#include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/salvage.h"
 
 namespace lookhaven::maintenance {
@@ -53,7 +53,7 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_
     if (!folder) {
         return false;
     }
-    FinishDeletions(store, mount, *folder, now_s);
+    Deletion(store, mount, *folder, now_s).Finish();
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
     bool is_complete = true;
     store::Events events(store);

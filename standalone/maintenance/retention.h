@@ -3,31 +3,20 @@
 // Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
 //
 // Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
-//               (2) The row becomes pending deletion, where no search finds it, the file is removed, then the row. A
-//                   file that cannot be removed gets its row back; what a crash leaves in between is finished by the
-//                   next pass.
-//               (3) Archived and growing events and those on unmounted mounts are kept.
-//               (4) A mark is removed with the last of its footage.
-//               (5) The oldest is what was recorded first, not what has the earliest date: clocks have been wrong.
-//               (6) A disk that stays full whatever is deleted does not cost more than what should have made room.
+//               (2) Archived and growing events and those on unmounted mounts are kept.
+//               (3) The oldest is what was recorded first, not what has the earliest date: clocks have been wrong.
+//               (4) A disk that stays full whatever is deleted does not cost more than what should have made room.
 // Thread safety One thread.
 #pragma once
 
 #include <cstdint>
 
-#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/space_watch.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::maintenance {
-
-// What was deleted.
-struct RetentionResult {
-    int events = 0;
-    int marks = 0;
-    std::int64_t bytes = 0;
-};
 
 enum class AgeLimit { kApplies, kWaits };  // waits while the clock cannot be trusted
 
@@ -50,11 +39,8 @@ struct DiskWatch {
 // than the watch allows. An event is kept while one recorded before it is not old enough. The result is empty for a
 // mount that is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says
 // nothing about others: handle each mount by itself, and try again later. The events deleted until then stay deleted.
-RetentionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
-                                 DiskWatch& watch);
-
-// Finishes the deletions that a crash interrupted on the mount. Throws as EnforceRetention.
-void FinishDeletions(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s);
+DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
+                                DiskWatch& watch);
 
 // What the mount's own limits would have EnforceRetention delete by and by, without what a full disk adds.
 struct RetentionForecast {

@@ -11,9 +11,9 @@
 #include "standalone/archive/mount_file.h"
 #include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
+#include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/marks.h"
-#include "standalone/maintenance/retention.h"
 #include "standalone/maintenance/salvage.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
@@ -64,7 +64,7 @@ class Verification {
             return;
         }
         if (repair_) {
-            FinishDeletions(store_, mount, *folder, base::WallSeconds());
+            Deletion(store_, mount, *folder, base::WallSeconds()).Finish();
         }
         for (std::size_t i = 0; i < rows.size(); ++i) {
             Try([&] { CheckRow(*folder, rows[i]); });

@@ -94,7 +94,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const int space_requests = context_.space_requests;
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
-        const maintenance::RetentionResult deleted = maintenance::EnforceRetention(
+        const maintenance::DeletionResult deleted = maintenance::EnforceRetention(
             store, mount,
             {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits, now_us},
             disk_watch_);

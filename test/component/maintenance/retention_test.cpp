@@ -57,7 +57,7 @@ class RetentionTest : public testing::Test {
   protected:
     RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId())); }
 
-    RetentionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
+    DeletionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
@@ -91,7 +91,7 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     const int third = footage_.Record(1, kNoon + 160, 60);
     const std::vector<fs::path> gone = {footage_.FileOf(first), footage_.FileOf(second)};
     EXPECT_EQ(Run(3 * kEventBytes).events, 0) << "as much as is allowed";
-    const RetentionResult removed = Run(kEventBytes);
+    const DeletionResult removed = Run(kEventBytes);
     EXPECT_EQ(removed.events, 2);
     EXPECT_EQ(removed.bytes, 2 * kEventBytes);
     EXPECT_THAT(Left(), ElementsAre(third));
