@@ -168,11 +168,11 @@ void Supervisor::DropEndedWorkers() {
 void Supervisor::Start(control::LiveStream stream, const StreamPlan& plan) {
     try {
         workers_.emplace(stream, std::make_unique<StreamWorker>(installation_, kinds_, stream, plan, no_data_limit_));
-        reported_failure_.clear();
+        reported_failures_.erase(stream);
     } catch (const std::exception& failure) {
-        if (failure.what() != reported_failure_) {
-            reported_failure_ = failure.what();
-            base::LogError("cannot start camera " + std::to_string(stream.camera) + ": " + reported_failure_);
+        std::string& reported = reported_failures_[stream];
+        if (std::exchange(reported, failure.what()) != reported) {
+            base::LogError("cannot start camera " + std::to_string(stream.camera) + ": " + reported);
         }
     }
 }

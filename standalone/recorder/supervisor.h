@@ -59,7 +59,7 @@ class Supervisor {
     std::int64_t seconds_ = 0;
     bool common_config_refreshed_ = true;
     bool some_are_ending_ = false;
-    std::string reported_failure_;
+    std::map<control::LiveStream, std::string> reported_failures_;  // of streams that could not be started
 };
 
 }  // namespace lookhaven::recorder
