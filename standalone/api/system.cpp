@@ -20,7 +20,8 @@ namespace lookhaven::api {
 namespace {
 
 constexpr int kMonitorUserId = -1;  // all monitors together
-constexpr const char* kNoMonitor = "monitors must run on this machine or send the token of lookhaven set monitor-token";
+constexpr const char* kNoMonitor =
+    "monitors must run on this machine or send the token of lookhaven setting set monitor-token";
 
 // Null when it cannot be opened, which is what a monitor wants to be told.
 store::Store* TryToOpen(const Call& call) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven setting, set: what holds for the whole installation.
+// lookhaven setting: what holds for the whole installation.
 #include <string>
 
 #include "standalone/cli/command_group.h"
@@ -82,7 +82,7 @@ void Check(const Console& console, const CheckRequest& request) {
 }  // namespace
 
 void AddSetting(CLI::App& program, const Console& console) {
-    CommandGroup<> group(program, console, "setting", "Numbers that hold for the whole installation");
+    CommandGroup<> group(program, console, "setting", "What holds for the whole installation");
     group.Add("show", "Shows all settings", Show);
     CommandGroup<CheckRequest> check(group.app(), console);
     check.Add("check", "Checks the settings of the installed services", Check)
@@ -93,12 +93,10 @@ void AddSetting(CLI::App& program, const Console& console) {
                 [&setting](const Console& shown_on, const Request& given) { Set(shown_on, setting, given.value); })
             .Option("value", set.request().value, "", Required, Satisfies(CLI::Range(setting.min, setting.max)));
     }
-    CommandGroup<Request> role(program, console, "set", "The role of this host, and the monitors' token");
-    role.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
-        .Option("value", role.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
-    role.Add("monitor-token", "Token that lets a monitor on another machine read /healthz and /metrics",
-             SetMonitorToken)
-        .Option("value", role.request().word, "new: replaces it and prints it, once; off: removes it", Required,
+    set.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
+        .Option("value", set.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
+    set.Add("monitor-token", "Token that lets a monitor on another machine read /healthz and /metrics", SetMonitorToken)
+        .Option("value", set.request().word, "new: replaces it and prints it, once; off: removes it", Required,
                 Satisfies(CLI::IsMember({"new", "off"})));
 }
 

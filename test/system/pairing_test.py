@@ -66,7 +66,7 @@ class PairingTest(unittest.TestCase):
         cls.owner = cls.enterClassContext(Installation())
         cls.watcher = cls.enterClassContext(Installation())
         cls.pair()
-        cls.watcher.cli("set", "cms", "on")
+        cls.watcher.cli("setting", "set", "cms", "on")
         cls.cameras = cls.known()
 
     @classmethod

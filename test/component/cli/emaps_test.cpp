@@ -106,8 +106,8 @@ TEST_F(EmapsTest, AnotherHostIsTakenInByItsLineAlone) {
           {"server add Owner", 65, "no certificate", "", "lookhaven-pair-1:e30=\n"},
           {"server list --json", 0, "[]"},
           {"server remove 1", 66, "no server 1"},
-          {"set cms on", 0, "manages"},
-          {"set cms maybe", 64, "value"}});
+          {"setting set cms on", 0, "manages"},
+          {"setting set cms maybe", 64, "value"}});
 }
 
 }  // namespace
