@@ -44,6 +44,10 @@ void Installation::CreateFolders(const std::filesystem::path& home) {
     }
 }
 
+std::string Installation::DefaultStoreUrl() const {
+    return "sqlite:" + (home_ / "lookhaven.db").string();
+}
+
 std::string Installation::StoreUrl() const {
     const std::filesystem::path override_file = home_ / "store";
     if (std::filesystem::exists(override_file)) {
@@ -51,7 +55,16 @@ std::string Installation::StoreUrl() const {
         url.erase(url.find_last_not_of(" \r\n") + 1);
         return url;
     }
-    return "sqlite:" + (home_ / "lookhaven.db").string();
+    return DefaultStoreUrl();
+}
+
+void Installation::SetStoreUrl(const std::string& url) const {
+    const std::filesystem::path override_file = home_ / "store";
+    if (url == DefaultStoreUrl()) {
+        std::filesystem::remove(override_file);
+    } else {
+        WriteFileAtomically(override_file, url + "\n");
+    }
 }
 
 }  // namespace lookhaven::base

@@ -32,11 +32,15 @@ class Installation {
 
     // "sqlite:<path>" or "postgresql://…": the file "store" in the state folder, else SQLite inside the folder.
     std::string StoreUrl() const;
+    // From the next call of StoreUrl on; running programs keep the one they have. Throws std::system_error.
+    void SetStoreUrl(const std::string& url) const;
 
     // Tells installations of this machine apart; stable while the folder stays where it is.
     std::uint64_t Id() const { return id_; }
 
   private:
+    std::string DefaultStoreUrl() const;
+
     std::filesystem::path home_;
     std::uint64_t id_;
 };

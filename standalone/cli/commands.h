@@ -20,6 +20,8 @@ void AddEmap(CLI::App& program, const Console& console);
 void AddDevices(CLI::App& program, const Console& console);
 void AddServer(CLI::App& program, const Console& console);
 void AddSetting(CLI::App& program, const Console& console);
+void AddStore(CLI::App& program, const Console& console);
+void AddBackup(CLI::App& program, const Console& console);
 void AddVerify(CLI::App& program, const Console& console);
 void AddDemo(CLI::App& program, const Console& console);
 void AddDoctor(CLI::App& program, const Console& console);

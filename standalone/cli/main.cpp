@@ -75,7 +75,7 @@ int Run(int argc, char** argv) {
                        "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
     for (const auto add : {AddInit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddEmap, AddDevices,
-                           AddServer, AddSetting, AddVerify, AddDemo, AddDoctor}) {
+                           AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);

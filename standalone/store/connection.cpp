@@ -155,6 +155,18 @@ Connection::Transaction::~Transaction() {
     }
 }
 
+Connection::Snapshot::Snapshot(Connection& connection) : session_(connection.session_) {
+    session_ << (connection.IsSqlite() ? "begin" : "begin isolation level repeatable read, read only");
+}
+
+Connection::Snapshot::~Snapshot() {
+    try {
+        session_ << "rollback";
+    } catch (const soci::soci_error&) {
+        // The connection is gone, and the transaction with it.
+    }
+}
+
 int NextId(soci::session& sql, const std::string& counter) {
     return FetchOne<int>(sql,
                          "update counters set value = case when name = 'user' and value + 1 = :reserved then value + 2"

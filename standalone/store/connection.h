@@ -72,6 +72,16 @@ class Connection {
         });
     }
 
+    // Calls ask(session), to which the store stays as it is at one moment while others go on changing it. Not inside
+    // another, nor inside Write.
+    template <typename Ask>
+    auto ReadAtOneMoment(Ask&& ask) {
+        return Read([&](soci::session& sql) {
+            const Snapshot snapshot(*this);
+            return ask(sql);
+        });
+    }
+
     // As the functions of query.h, each in a Read of its own.
     template <typename Row, typename... Parameter>
     std::optional<Row> FetchOne(const std::string& text, const Parameter&... parameters) {
@@ -105,6 +115,17 @@ class Connection {
         const bool is_part_;
         std::vector<std::string> restore_;
         bool is_open_ = false;
+    };
+
+    class Snapshot {
+      public:
+        explicit Snapshot(Connection& connection);
+        Snapshot(const Snapshot&) = delete;
+        Snapshot& operator=(const Snapshot&) = delete;
+        ~Snapshot();
+
+      private:
+        soci::session& session_;
     };
 
     Engine engine_;

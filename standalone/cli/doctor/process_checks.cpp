@@ -1,50 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The web API host and the recorder: whether they run and do their work.
-#include <cstring>
-
-#include <poll.h>
-#include <sys/socket.h>
-#include <sys/un.h>
-
-#include "standalone/base/file_descriptor.h"
 #include "standalone/cli/doctor/checks.h"
+#include "standalone/cli/running.h"
 #include "standalone/control/common_config.h"
 #include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::cli::doctor {
-
-namespace {
-
-constexpr int kSocketTimeoutMs = 3000;
-
-// Any answer shows that the host accepts connections, forks and responds.
-bool HostAnswers(const std::string& path) {
-    sockaddr_un address{};
-    address.sun_family = AF_UNIX;
-    const base::FileDescriptor socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-    if (!socket || path.size() >= sizeof address.sun_path) {
-        return false;
-    }
-    std::memcpy(address.sun_path, path.data(), path.size());
-    if (::connect(socket.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-        return false;
-    }
-    std::string head;
-    for (const char* part : {"CONTENT_LENGTH", "0", "SCGI", "1", "REQUEST_METHOD", "GET", "REQUEST_URI", "/webapi",
-                             "QUERY_STRING", "api=VEXO.Auth&version=1&method=Status"}) {
-        head.append(part).push_back('\0');
-    }
-    const std::string request = std::to_string(head.size()) + ":" + head + ",";
-    if (::send(socket.Get(), request.data(), request.size(), MSG_NOSIGNAL) != static_cast<ssize_t>(request.size())) {
-        return false;
-    }
-    pollfd wait{socket.Get(), POLLIN, 0};
-    char byte = 0;
-    return ::poll(&wait, 1, kSocketTimeoutMs) == 1 && ::recv(socket.Get(), &byte, 1, 0) == 1;
-}
-
-}  // namespace
 
 // An installation of the packages is run by services.
 std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log) {
@@ -53,11 +15,11 @@ std::string HowToStart(const base::Installation& installation, const std::filesy
 }
 
 Findings CheckHost(const base::Installation& installation) {
-    const std::string socket = installation.WebApiSocket().string();
-    if (HostAnswers(socket)) {
+    if (HostAnswers(installation)) {
         return {};
     }
-    return {{"the web API host does not answer at " + socket, HowToStart(installation, installation.LogFolder())}};
+    return {{"the web API host does not answer at " + installation.WebApiSocket().string(),
+             HowToStart(installation, installation.LogFolder())}};
 }
 
 Findings CheckRecorder(const base::Installation& installation) {

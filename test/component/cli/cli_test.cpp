@@ -51,6 +51,7 @@ TEST_F(CliTest, RootLeavesOnlyFilesThatTheOwnerOfTheStateFolderCanUse) {
     Play({{"init --admin admin", 0, "Added account admin", "", "admin-s3cret\n"},
           {"demo setup", 0, "", "", "viewer-s3cret\n"},
           {"log set debug", 0, ""},
+          {"backup '" + folder_.Path().string() + "/backup'", 0, "Backed up"},
           {"mount add " + folder_.Path().string(), 77, ""}});
     for (const auto& entry : std::filesystem::recursive_directory_iterator(home_)) {
         struct stat status {};
@@ -245,8 +246,22 @@ TEST_F(CliTest, AnInstallationMayKeepItsStoreInPostgresql) {
     base::Installation::CreateFolders(home_);
     std::ofstream(home_ / "store") << server.NewDatabase() << "\n";
     SetUpDemo();
-    Play({{"camera list", 0, "Entrance"}, {"user list", 0, "viewer"}});
+    const std::string backup = (folder_ / "backup").string();
+    const std::string moved = "sqlite:" + (folder_ / "moved.db").string();
+    Play({{"camera list", 0, "Entrance"},
+          {"user list", 0, "viewer"},
+          {"store show", 0, "postgresql:"},
+          {"backup " + backup, 0, "Backed up"},
+          {"backup " + backup, 71, "exists"},
+          {"restore " + backup, 65, "accounts"},
+          {"restore " + backup + "-absent", 66, "absent"},
+          {"restore /dev/null", 65, "no backup"},
+          {"store move sqlite:moved.db", 65, "absolute"}});
     EXPECT_FALSE(std::filesystem::exists(home_ / "lookhaven.db"));
+    Play({{"store move -", 0, "Moved", "", moved + "\n"},
+          {"store move " + moved, 65, "already"},
+          {"store show", 0, "moved.db"},
+          {"camera list", 0, "Entrance"}});
 }
 
 }  // namespace

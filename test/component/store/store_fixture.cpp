@@ -8,13 +8,14 @@
 
 namespace lookhaven::store {
 
-EmptyStore::EmptyStore() {
-    if (GetParam() == Engine::kPostgresql) {
+EmptyStore::EmptyStore() : url_(NewUrl(GetParam(), "lookhaven.db")) {}
+
+std::string EmptyStore::NewUrl(Engine engine, const std::string& name) const {
+    if (engine == Engine::kPostgresql) {
         static test::TemporaryPostgres server;
-        url_ = server.NewDatabase();
-        return;
+        return server.NewDatabase();
     }
-    url_ = "sqlite:" + (folder_ / "lookhaven.db").string();
+    return "sqlite:" + (folder_ / name).string();
 }
 
 std::string EmptyStore::Ask(const std::string& query) {

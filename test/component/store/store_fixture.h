@@ -22,6 +22,8 @@ class EmptyStore : public testing::TestWithParam<Engine> {
   protected:
     EmptyStore();
 
+    // The address of a store that is not there yet; the name is that of SQLite's file.
+    std::string NewUrl(Engine engine, const std::string& name) const;
     // Reads and writes past the records' classes.
     std::string Ask(const std::string& query);
     void Force(const std::string& statement);

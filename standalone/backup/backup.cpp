@@ -1,0 +1,224 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/backup/backup.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <map>
+#include <memory>
+#include <optional>
+#include <stdexcept>
+#include <string_view>
+#include <system_error>
+
+#include <fcntl.h>
+#include <json/json.h>
+#include <sys/file.h>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/store/copy.h"
+
+namespace lookhaven::backup {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr int kFormat = 1;
+constexpr const char* kManifest = "manifest.json";
+constexpr const char* kRecords = "records.db";
+constexpr const char* kPictures = "emaps";
+constexpr const char* kCertificate = "tls";
+
+// A folder of its own in the run folder; what an interrupted one left goes first.
+class WorkFolder {
+  public:
+    explicit WorkFolder(const base::Installation& installation)
+        : path_(installation.RunFolder() / "backup"),
+          lock_(base::OpenFile(installation.RunFolder() / "backup.lock", O_RDWR | O_CREAT)) {
+        if (::flock(lock_.Get(), LOCK_EX | LOCK_NB) != 0) {
+            throw std::runtime_error("another backup of " + installation.Home().string() + " is made or restored");
+        }
+        fs::remove_all(path_);
+        fs::create_directory(path_);
+        fs::permissions(path_, fs::perms::owner_all);
+    }
+    WorkFolder(const WorkFolder&) = delete;
+    WorkFolder& operator=(const WorkFolder&) = delete;
+    ~WorkFolder() {
+        std::error_code ignored;
+        fs::remove_all(path_, ignored);
+    }
+
+    fs::path operator/(const std::string& name) const { return path_ / name; }
+
+  private:
+    fs::path path_;
+    base::FileDescriptor lock_;
+};
+
+std::string SqliteUrl(const fs::path& path) {
+    return "sqlite:" + path.string();
+}
+
+// Digits, letters, "-", "_" and "."; not hidden, so neither "." nor "..".
+bool IsPlainName(std::string_view name) {
+    return !name.empty() && name.front() != '.' && std::ranges::all_of(name, [](char c) {
+        return (c >= '0' && c <= '9') || (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || c == '-' || c == '_' ||
+               c == '.';
+    });
+}
+
+// Whether a file of that name belongs to a backup: it is written where its name says.
+bool IsKnownName(std::string_view name) {
+    const std::size_t slash = name.find('/');
+    if (slash == std::string_view::npos) {
+        return name == kManifest || name == kRecords;
+    }
+    const std::string_view folder = name.substr(0, slash);
+    return (folder == kPictures || folder == kCertificate) && IsPlainName(name.substr(slash + 1));
+}
+
+class BackupWriter {
+  public:
+    explicit BackupWriter(int descriptor) : tar_(descriptor) {}
+
+    void Add(const std::string& name, const fs::path& path) {
+        const FileDigest digest = tar_.AddFile(name, path);
+        Json::Value& file = files_.append(Json::objectValue);
+        file["name"] = name;
+        file["size"] = Json::Int64{digest.size_bytes};
+        file["sha256"] = digest.sha256;
+    }
+
+    // The files of a folder that may lack; returns how many there are.
+    int AddFolder(const std::string& folder, const fs::path& path) {
+        std::error_code error;
+        int count = 0;
+        for (const fs::directory_entry& file : fs::directory_iterator(path, error)) {
+            if (fs::is_regular_file(file.symlink_status()) && IsPlainName(file.path().filename().string())) {
+                Add(folder + "/" + file.path().filename().string(), file.path());
+                ++count;
+            }
+        }
+        if (error && error != std::errc::no_such_file_or_directory) {
+            throw std::system_error(error, "cannot read " + path.string());
+        }
+        return count;
+    }
+
+    void Finish(const Summary& summary) {
+        Json::Value manifest;
+        manifest["lookhaven_backup"] = kFormat;
+        manifest["version"] = summary.version;
+        manifest["made"] = Json::Int64{summary.made_s};
+        manifest["file"] = files_;
+        tar_.AddText(kManifest, manifest.toStyledString());
+        tar_.Finish();
+    }
+
+  private:
+    TarWriter tar_;
+    Json::Value files_ = Json::arrayValue;
+};
+
+// Throws Malformed unless the manifest names those files with those contents, and no others.
+Summary CheckManifest(const fs::path& path, const std::map<std::string, FileDigest>& files) try {
+    Json::Value manifest;
+    const std::string text = base::ReadFile(path);
+    std::string errors;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    if (!reader->parse(text.data(), text.data() + text.size(), &manifest, &errors)) {
+        throw Malformed("the backup's manifest is damaged");
+    }
+    if (manifest["lookhaven_backup"].asInt() != kFormat) {
+        throw Malformed("the backup was made by a newer program: update Lookhaven on this host");
+    }
+    std::map<std::string, FileDigest> named;
+    for (const Json::Value& file : manifest["file"]) {
+        named[file["name"].asString()] = {file["size"].asInt64(), file["sha256"].asString()};
+    }
+    if (named != files || !files.contains(kRecords)) {
+        throw Malformed("the backup is damaged: its files are not those that its manifest names");
+    }
+    return {.version = manifest["version"].asString(), .made_s = manifest["made"].asInt64()};
+} catch (const Json::Exception&) {
+    throw Malformed("the backup's manifest is damaged");
+}
+
+// Unpacks everything below the folder, and throws Malformed for what is not whole.
+Summary Unpack(int descriptor, const WorkFolder& folder) {
+    for (const char* name : {kPictures, kCertificate}) {
+        fs::create_directory(folder / name);
+    }
+    TarReader tar(descriptor);
+    std::map<std::string, FileDigest> files;
+    bool is_whole = false;
+    while (const std::optional<std::string> name = tar.Next()) {
+        if (!IsKnownName(*name) || files.contains(*name) || is_whole) {
+            throw Malformed("this is no backup, or a damaged one: it holds a file that belongs to none");
+        }
+        const FileDigest digest = tar.CopyTo(folder / *name);
+        is_whole = *name == kManifest;
+        if (!is_whole) {
+            files[*name] = digest;
+        }
+    }
+    if (!is_whole) {
+        throw Malformed("the backup is incomplete: its end is missing");
+    }
+    return CheckManifest(folder / kManifest, files);
+}
+
+// Each file becomes visible in one step. Returns how many there are.
+int MoveFiles(const fs::path& from, const fs::path& to) {
+    int count = 0;
+    for (const fs::directory_entry& file : fs::directory_iterator(from)) {
+        if (fs::create_directories(to)) {
+            fs::permissions(to, fs::perms::owner_all);
+        }
+        fs::rename(file.path(), to / file.path().filename());
+        ++count;
+    }
+    return count;
+}
+
+}  // namespace
+
+Summary Write(const base::Installation& installation, store::Store& store, int descriptor, Certificate certificate,
+              const std::string& version) {
+    const WorkFolder folder(installation);
+    const fs::path records = folder / kRecords;
+    Summary summary{.version = version, .made_s = base::WallSeconds()};
+    // First the records: a picture is there before the first map names it, and for a minute after the last.
+    store::Store::Migrate(SqliteUrl(records));
+    {
+        store::Store copy = store::Store::Open(SqliteUrl(records));
+        summary.records = CopyRecords(store, copy, store::CopySessions::kNo);
+    }
+    BackupWriter writer(descriptor);
+    writer.Add(kRecords, records);
+    summary.pictures = writer.AddFolder(kPictures, installation.Home() / kPictures);
+    if (certificate == Certificate::kIncluded) {
+        summary.has_certificate = writer.AddFolder(kCertificate, installation.TlsFolder()) > 0;
+    }
+    writer.Finish(summary);
+    return summary;
+}
+
+Summary Restore(const base::Installation& installation, int descriptor) {
+    const WorkFolder folder(installation);
+    Summary summary = Unpack(descriptor, folder);
+    const std::string records = SqliteUrl(folder / kRecords);
+    store::Store::Migrate(records);
+    store::Store source = store::Store::Open(records);
+    store::Store::Migrate(installation.StoreUrl());
+    store::Store target = store::Store::Open(installation.StoreUrl());
+    // First the pictures, which no map names yet: a map never lacks its picture.
+    summary.pictures = MoveFiles(folder / kPictures, installation.Home() / kPictures);
+    summary.records = CopyRecords(source, target, store::CopySessions::kNo);
+    summary.has_certificate = MoveFiles(folder / kCertificate, installation.TlsFolder()) > 0;
+    return summary;
+}
+
+}  // namespace lookhaven::backup

@@ -1,0 +1,181 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/copy.h"
+
+#include <array>
+#include <cstddef>
+#include <deque>
+#include <ranges>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "standalone/store/connection.h"
+#include "standalone/store/schema.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+// What belongs to the place and not to the records.
+constexpr std::array<std::string_view, 3> kNotCopied = {"schema_version", "recorder_lease", "login_attempts"};
+
+// PostgreSQL's client takes in all rows of an answer.
+constexpr const char* kOpenCursor = "declare copied no scroll cursor for select * from ";
+constexpr const char* kFetchFromCursor = "fetch 1000 from copied";
+constexpr const char* kCloseCursor = "close copied";
+
+// In the order in which they were created, so that what refers to a row comes after it.
+std::vector<std::string> CopiedTables(CopySessions sessions) {
+    constexpr std::string_view kCreate = "create table ";
+    std::vector<std::string> tables;
+    for (const Migration& migration : Migrations()) {
+        for (const std::string_view statement : migration.statements) {
+            if (!statement.starts_with(kCreate)) {
+                continue;
+            }
+            const std::string_view rest = statement.substr(kCreate.size());
+            const std::string_view name = rest.substr(0, rest.find(' '));
+            if (std::ranges::find(kNotCopied, name) == kNotCopied.end() &&
+                (name != "sessions" || sessions == CopySessions::kYes)) {
+                tables.emplace_back(name);
+            }
+        }
+    }
+    return tables;
+}
+
+// A value of either of the two types that columns have.
+struct Value {
+    bool is_text = false;
+    long long number = 0;
+    std::string text;
+};
+
+void Assign(const soci::row& row, std::size_t column, Value& value) {
+    switch (row.get_properties(column).get_data_type()) {
+    case soci::dt_string:
+        value.is_text = true;
+        value.text = row.get<std::string>(column);
+        return;
+    case soci::dt_integer:
+        value.number = row.get<int>(column);
+        return;
+    case soci::dt_long_long:
+        value.number = row.get<long long>(column);
+        return;
+    default:
+        throw StoreError("the record store has a column " + row.get_properties(column).get_name() +
+                         " of a type that cannot be copied");
+    }
+}
+
+// Inserts rows whose columns are those of the first one.
+class Insertion {
+  public:
+    Insertion(soci::session& sql, const std::string& table, const soci::row& first) : statement_(sql) {
+        std::string columns;
+        for (std::size_t i = 0; i < first.size(); ++i) {
+            columns += (i == 0 ? "" : ", ") + first.get_properties(i).get_name();
+            Assign(first, i, values_.emplace_back());
+            if (values_.back().is_text) {
+                statement_.exchange(soci::use(values_.back().text));
+            } else {
+                statement_.exchange(soci::use(values_.back().number));
+            }
+        }
+        statement_.alloc();
+        statement_.prepare(InsertText(table, columns), kRepeatedly);
+        statement_.define_and_bind();
+    }
+
+    void Run(const soci::row& row) {
+        for (std::size_t i = 0; i < values_.size(); ++i) {
+            Assign(row, i, values_[i]);
+        }
+        store::Run(statement_);
+    }
+
+  private:
+    std::deque<Value> values_;  // stay where they are, since they are bound
+    soci::statement statement_;
+};
+
+// Calls use(row) for each row of the answer; returns their number.
+template <typename Use>
+std::int64_t Visit(soci::session& sql, const std::string& query, Use&& use) {
+    soci::row row;
+    soci::statement statement(sql);
+    statement.exchange(soci::into(row));
+    statement.alloc();
+    statement.prepare(query, kOnce);
+    statement.define_and_bind();
+    std::int64_t rows = 0;
+    for (bool has_row = statement.execute(true); has_row; has_row = statement.fetch()) {
+        use(row);
+        ++rows;
+    }
+    return rows;
+}
+
+std::int64_t CopyTable(Connection& source, soci::session& from, soci::session& to, const std::string& table) {
+    std::optional<Insertion> insertion;
+    const auto insert = [&](const soci::row& row) {
+        if (!insertion) {
+            insertion.emplace(to, table, row);
+        }
+        insertion->Run(row);
+    };
+    if (source.IsSqlite()) {
+        return Visit(from, "select * from " + table, insert);
+    }
+    from << kOpenCursor + table;
+    std::int64_t all = 0;
+    std::int64_t rows = 0;
+    do {
+        rows = Visit(from, kFetchFromCursor, insert);
+        all += rows;
+    } while (rows > 0);
+    from << kCloseCursor;
+    return all;
+}
+
+// Records that somebody made; those of a new store may be replaced.
+void RequireUnused(soci::session& sql) {
+    for (const auto& [table, records] : {std::pair("users", "accounts"), std::pair("cameras", "cameras"),
+                                         std::pair("events", "recordings"), std::pair("marks", "alerts")}) {
+        if (FetchOne<int>(sql, std::string("select count(*) from ") + table).value() > 0) {
+            throw InvalidRecord("the record store to fill is in use, it has " + std::string(records) +
+                                " of its own: use an empty one");
+        }
+    }
+}
+
+void LiftTimeLimit(Connection& connection, soci::session& sql) {
+    if (!connection.IsSqlite()) {
+        sql << "set local statement_timeout = 0";
+    }
+}
+
+}  // namespace
+
+std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
+    const std::vector<std::string> tables = CopiedTables(sessions);
+    return source.connection().ReadAtOneMoment([&](soci::session& from) {
+        LiftTimeLimit(source.connection(), from);
+        return target.connection().Write([&](soci::session& to) {
+            LiftTimeLimit(target.connection(), to);
+            RequireUnused(to);
+            for (const std::string& table : tables | std::views::reverse) {
+                Execute(to, "delete from " + table);
+            }
+            std::int64_t rows = 0;
+            for (const std::string& table : tables) {
+                rows += CopyTable(source.connection(), from, to, table);
+            }
+            return rows;
+        });
+    });
+}
+
+}  // namespace lookhaven::store

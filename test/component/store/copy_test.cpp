@@ -1,0 +1,70 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Copying a store's records into another one, on the same engine or the other.
+#include "standalone/store/copy.h"
+
+#include "standalone/store/emaps.h"
+#include "standalone/store/events.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/recorder_lease.h"
+#include "standalone/store/sessions.h"
+#include "standalone/store/settings.h"
+#include "standalone/store/users.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+
+class CopyTest : public StoreTest {
+  protected:
+    void Fill() {
+        AddCamera();
+        Cameras(store_).SetCredentials(AddCamera(), Credentials{"admin", "x'; drop table users; --"});
+        const int user = Users(store_).Add("bob", "correct horse", Privilege::kViewer).id;
+        Users(store_).Deny(user, 2, {CameraAccess::kAudio});
+        Settings(store_).Set("place", "Zürich :name $1 \\");
+        Emaps(store_).Add({.name = "Ground floor"});
+        std::vector<Event> events;
+        for (int i = 0; i < kEvents; ++i) {
+            events.push_back({.camera_id = 1,
+                              .mount_id = 1,
+                              .start_s = 5'000'000'000 + 10 * i,
+                              .end_s = 5'000'000'010 + 10 * i,
+                              .size_bytes = 6'000'000'000,
+                              .audio_codec = i % 2 == 0 ? "" : "aac",
+                              .path = "1/20240101/AM/a'b.mkv"});
+        }
+        Events(store_).AddAll(events);
+        RecorderLease(store_).Take(0, "elsewhere", 7);
+    }
+
+    static constexpr int kEvents = 1'100;  // more than one fetch of a cursor
+};
+
+TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
+    Fill();
+    for (const Engine engine : {Engine::kSqlite, Engine::kPostgresql}) {
+        const std::string url = NewUrl(engine, "copy.db");
+        Store::Migrate(url);
+        Store copy = Store::Open(url);
+        EXPECT_GT(CopyRecords(store_, copy, CopySessions::kYes), kEvents);
+        EXPECT_EQ(Cameras(copy).List(), Cameras(store_).List());
+        EXPECT_EQ(Cameras(copy).FindCredentials(2)->password, "x'; drop table users; --");
+        EXPECT_TRUE(Users(copy).CheckPassword("BOB", "correct horse"));
+        EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kAudio), ElementsAre(2));
+        EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));
+        EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
+        EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));
+        EXPECT_EQ(RecorderLease(copy).Current().holder, "") << "whoever held it records into the other store";
+        EXPECT_THAT(copy.Check(), testing::IsEmpty());
+        EXPECT_THROW(CopyRecords(store_, copy, CopySessions::kYes), InvalidRecord) << "it has records to lose now";
+        EXPECT_EQ(Cameras(copy).Add({.name = "Yard", .profiles = {{.source = "test:mjpeg"}}}), 3);
+    }
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(CopyTest);
+
+}  // namespace
+}  // namespace lookhaven::store
