@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/copy.h"
 
+#include <algorithm>
 #include <array>
 #include <cstddef>
 #include <deque>
-#include <ranges>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -166,8 +167,8 @@ std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
         return target.connection().Write([&](soci::session& to) {
             LiftTimeLimit(target.connection(), to);
             RequireUnused(to);
-            for (const std::string& table : tables | std::views::reverse) {
-                Execute(to, "delete from " + table);
+            for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
+                Execute(to, "delete from " + *table);
             }
             std::int64_t rows = 0;
             for (const std::string& table : tables) {
