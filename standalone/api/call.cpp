@@ -13,6 +13,11 @@ std::int64_t Call::NumberOr(const std::string& name, std::int64_t fallback) cons
     return value.isNull() ? fallback : value.asInt64();
 }
 
+admin::Actor Call::Actor() const {
+    const binding::Login& caller = login.value();
+    return {static_cast<int>(caller.user_id), caller.account, std::string(request.Header("REMOTE_ADDR"))};
+}
+
 std::string SuccessAnswer(const Json::Value& data, const std::string& extra) {
     return http::JsonAnswer(200, binding::SuccessText(data), extra);
 }

@@ -9,6 +9,7 @@
 
 #include <json/json.h>
 
+#include "standalone/admin/actor.h"
 #include "standalone/api/parameters.h"
 #include "standalone/binding/request.h"
 #include "standalone/binding/request_context.h"
@@ -44,6 +45,8 @@ struct Call {
     // The parameter's number, or fallback when it is missing. Throws Json::Exception for what is no number.
     std::int64_t NumberOr(const std::string& name, std::int64_t fallback) const;
     store::Store& Records() const { return context.Records(); }
+    // The caller, for what it changes. Only with a login.
+    admin::Actor Actor() const;
 };
 
 // {"success": true, "data": data}. extra: further header lines, each ending in CR LF.

@@ -26,7 +26,7 @@ struct Method {
 struct OwnApi {
     const char* name;
     std::span<const Method> methods;
-    bool needs_session = true;
+    bool needs_session = true;  // where it is false, what is for managers needs one all the same
 
     // Throws Failure 404 when it has no such method.
     const Method& Find(int version, const std::string& method) const;

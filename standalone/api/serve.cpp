@@ -12,6 +12,7 @@
 #include <sys/uio.h>
 #include <unistd.h>
 
+#include "standalone/admin/change.h"
 #include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
@@ -138,6 +139,10 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
         throw Failure(404, error.what());
     } catch (const store::Conflict& error) {
         throw Failure(409, error.what());
+    } catch (const admin::Stale& error) {
+        throw Failure(409, error.what(), 0, admin::ToText(error.Record()));
+    } catch (const admin::Forbidden& error) {
+        throw Failure(403, error.what());
     }
 }
 
@@ -155,7 +160,9 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     if (CostClassOf(call) == CostClass::kPictures) {
         LimitAddressSpace(kMaxAddressSpaceForPictures);
     }
-    if (own == nullptr || own->needs_session) {
+    const bool needs_session = own == nullptr || own->needs_session ||
+                               own->Find(call.version, call.method).audience == Method::Audience::kManagers;
+    if (needs_session) {
         Admit(call, service.limits);
     }
     if (own != nullptr) {

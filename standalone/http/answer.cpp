@@ -48,8 +48,8 @@ std::string JsonAnswer(int status, const std::string& body, const std::string& e
 std::string FailureAnswer(const Failure& failure) {
     const int retry_after_s = failure.RetryAfterSeconds();
     return JsonAnswer(failure.Status(),
-                      R"({"error":{"code":)" + std::to_string(failure.Status()) + R"(,"data":null,"message":)" +
-                          Json::valueToQuotedString(failure.what()) + R"(},"success":false})",
+                      R"({"error":{"code":)" + std::to_string(failure.Status()) + R"(,"data":)" + failure.Data() +
+                          R"(,"message":)" + Json::valueToQuotedString(failure.what()) + R"(},"success":false})",
                       retry_after_s > 0 ? "Retry-After: " + std::to_string(retry_after_s) + "\r\n" : "");
 }
 

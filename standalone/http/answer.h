@@ -5,6 +5,7 @@
 
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 namespace lookhaven::http {
 
@@ -14,17 +15,20 @@ constexpr int kRetrySoonSeconds = 1;
 // A failure that the client is told: HTTP status, which is the answer's code too, and a message without secrets.
 class Failure : public std::runtime_error {
   public:
-    // retry_after_s: when the client may succeed; 0 where waiting does not help.
-    Failure(int status, const std::string& message, int retry_after_s = 0)
+    // retry_after_s: when the client may succeed; 0 where waiting does not help. data: JSON that the client is told.
+    Failure(int status, const std::string& message, int retry_after_s = 0, std::string data = "null")
         : std::runtime_error(message),
           status_(status),
-          retry_after_s_(retry_after_s) {}
+          retry_after_s_(retry_after_s),
+          data_(std::move(data)) {}
     int Status() const { return status_; }
     int RetryAfterSeconds() const { return retry_after_s_; }
+    const std::string& Data() const { return data_; }
 
   private:
     int status_;
     int retry_after_s_;
+    std::string data_;
 };
 
 // The head of an answer with a body of JSON. extra: further header lines, each ending in CR LF.
@@ -33,7 +37,7 @@ std::string JsonHead(int status, std::size_t body_bytes, const std::string& extr
 // The whole answer. extra: further header lines, each ending in CR LF.
 std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
 
-// {"success": false, "error": {"code": status, "data": null, "message": …}}
+// {"success": false, "error": {"code": status, "data": data, "message": …}}
 std::string FailureAnswer(const Failure& failure);
 
 }  // namespace lookhaven::http

@@ -168,6 +168,14 @@ constexpr const char* kAlarms[] = {
     "create index events_by_alarm on events (camera_id, start_s) where reason <> 1",
 };
 
+// A row is never changed, only deleted, the oldest first.
+constexpr const char* kAuditLog[] = {
+    "insert into counters (name, value) values ('audit', 0)",
+    "create table audit_log (id integer not null primary key, time_s bigint not null, user_id integer not null,"
+    " who text not null, address text not null, action text not null, object text not null,"
+    " before_change text not null, after_change text not null)",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -179,6 +187,7 @@ constexpr Migration kMigrations[] = {
     {"reports whose footage is still to come", kPendingReports},
     {"sessions whose secret carries a tag", kTaggedSessions},
     {"alarms among continuous recordings", kAlarms},
+    {"the audit log", kAuditLog},
 };
 
 }  // namespace

@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/change.h"
+
+#include <charconv>
+
+#include "standalone/base/clock.h"
+#include "standalone/store/audit_log.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/transaction.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+constexpr std::size_t kMaxRecordBytes = 16'384;
+constexpr std::size_t kRevisionDigits = 12;
+
+std::string AuditText(const Json::Value& record) {
+    if (record.isNull()) {
+        return "";
+    }
+    std::string text = ToText(record);
+    return text.size() <= kMaxRecordBytes ? text : R"({"tooLarge":)" + std::to_string(text.size()) + "}";
+}
+
+}  // namespace
+
+void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
+    store::InTransaction(store, [&] {
+        RequireManager(store, actor);
+        const Change change = make();
+        if (change.before != change.after) {
+            store::AuditLog(store).Add({0, base::WallSeconds(), actor.user_id, actor.name, actor.address, change.action,
+                                        change.object, AuditText(change.before), AuditText(change.after)});
+        }
+    });
+}
+
+std::string Named(const std::string& name, int id) {
+    return name + " (" + std::to_string(id) + ")";
+}
+
+std::int64_t RevisionOf(const Json::Value& record) {
+    Json::Value content = record;
+    content.removeMember("revision");
+    const std::string digits = store::Digest(ToText(content)).substr(0, kRevisionDigits);
+    std::int64_t revision = 0;
+    std::from_chars(digits.data(), digits.data() + digits.size(), revision, 16);
+    return revision;
+}
+
+void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen) {
+    if (seen && *seen != RevisionOf(record)) {
+        throw Stale(record);
+    }
+}
+
+std::string ToText(const Json::Value& value) {
+    Json::StreamWriterBuilder writer;
+    writer["indentation"] = "";
+    return Json::writeString(writer, value);
+}
+
+}  // namespace lookhaven::admin
