@@ -50,7 +50,7 @@ std::int64_t RevisionOf(const Json::Value& record) {
 }
 
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen) {
-    if (seen && *seen != RevisionOf(record)) {
+    if (seen && *seen != record["revision"].asInt64()) {
         throw Stale(record);
     }
 }

@@ -49,7 +49,8 @@ class Stale : public std::runtime_error {
     Json::Value record_;
 };
 
-// Throws Stale where a revision was seen and the record's is another. Call it inside of Apply.
+// record: with its member "revision". Throws Stale where a revision was seen and that is another. Call it inside of
+// Apply.
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen);
 
 // JSON in one line; the same text for equal records.

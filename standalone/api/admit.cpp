@@ -65,11 +65,12 @@ const char* SessionCookie(const http::Request& request) {
 }
 
 CostClass CostClassOf(const Call& call) {
-    if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || IsPlayer(call)) {
+    const bool probes_camera = call.api == kCameraApi.name && call.method == "Probe";
+    if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || probes_camera || IsPlayer(call)) {
         return CostClass::kPictures;
     }
     const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name ||
-                          call.api == kSystemApi.name;
+                          call.api == kSystemApi.name || call.api == kCameraApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 

@@ -22,6 +22,8 @@ namespace {
 
 using Problems = std::vector<Problem>;
 
+constexpr std::int64_t kHourBeginSeconds = 10;
+
 void CheckStreams(const std::vector<control::StreamCounters>& streams, Problems& problems) {
     const std::int64_t now_us = base::MonotonicMicros();
     for (const control::StreamCounters& each : streams) {
@@ -35,13 +37,17 @@ void CheckStreams(const std::vector<control::StreamCounters>& streams, Problems&
 
 // Those that are to be recorded always, and that the recorder does not even try.
 void CheckCameras(store::Store& records, const std::vector<control::StreamCounters>& streams, Problems& problems) {
+    const std::int64_t now_s = base::WallSeconds();
     const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(records).List();
     for (const store::Camera& camera : store::Cameras(records).List()) {
         const auto plan = plans.find(camera.id);
         const bool is_recorded = std::ranges::any_of(streams, [&](const control::StreamCounters& each) {
             return each.is_recorded && each.stream.camera == camera.id;
         });
-        if (camera.enabled && plan != plans.end() && plan->second.mode == store::RecordMode::kAlways && !is_recorded) {
+        // An hour that has just begun is the recorder's to notice.
+        const auto is_due = [&](std::int64_t time_s) { return plan->second.At(time_s) == store::HourMode::kAlways; };
+        if (camera.enabled && plan != plans.end() && is_due(now_s) && is_due(now_s - kHourBeginSeconds) &&
+            !is_recorded) {
             problems.push_back({"camera", camera.id, "it should be recorded, but is not"});
         }
     }

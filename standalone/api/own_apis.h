@@ -33,6 +33,7 @@ struct OwnApi {
 };
 
 extern const OwnApi kAuthApi;      // log in, log out, who am I
+extern const OwnApi kCameraApi;    // cameras as a manager sets them up
 extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
 extern const OwnApi kEmapApi;      // what an editor of e-maps needs, and the states of doors and ports
 extern const OwnApi kEventApi;     // report what happened at a camera, list it, download its footage

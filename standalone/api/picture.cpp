@@ -11,17 +11,14 @@
 #include <cstdio>
 #include <optional>
 #include <span>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "platform/camera/camera.h"
 #include "platform/live/livestream.h"
-#include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/footage.h"
-#include "standalone/base/log.h"
+#include "standalone/api/still_picture.h"
 #include "standalone/binding/rights.h"
-#include "standalone/media/libav_libraries.h"
 #include "standalone/ring/reader.h"
 #include "standalone/store/cameras.h"
 
@@ -57,25 +54,11 @@ std::optional<KeyFrame> NewestKeyFrame(int camera, int stream) {
     return frame;
 }
 
-// Decodes a camera's bytes, confined. Throws Failure with that status where they cannot be decoded.
-template <typename Decode>
-std::vector<std::uint8_t> Confined(const Call& call, int failure_status, Decode&& decode) {
-    try {
-        const media::DecoderLibrary& decoder = media::LoadDecoderLibrary();
-        call.context.CloseRecords();
-        EnterStillPictureSandbox(call.slots, call.slot);
-        return decode(decoder);
-    } catch (const std::runtime_error& problem) {
-        base::LogError(std::string("no picture of a key frame: ") + problem.what());
-        throw Failure(failure_status, "the camera's picture cannot be decoded");
-    }
-}
-
 std::vector<std::uint8_t> Jpeg(const Call& call, KeyFrame frame) {
     if (frame.codec == "MJPEG") {
         return std::move(frame.data);
     }
-    return Confined(call, 504, [&frame](const media::DecoderLibrary& decoder) {
+    return DecodeConfined(call, 504, [&frame](const media::DecoderLibrary& decoder) {
         return decoder.Still(frame.codec, frame.data, base::kMaxFrameBytes);
     });
 }
@@ -171,26 +154,6 @@ RecordedKeyFrame KeyFrameOf(const Call& call) {
     return frame;
 }
 
-std::vector<std::uint8_t> SmallJpeg(const Call& call, RecordedKeyFrame frame, int width) {
-    if (frame.codec == "MJPEG" && frame.width <= width) {
-        return std::move(frame.data);
-    }
-    return Confined(call, 404, [&](const media::DecoderLibrary& library) {
-        if (frame.codec == "MJPEG") {
-            return library.Shrink(frame.data, width);
-        }
-        const auto decoder = library.OpenDecoder(frame.codec, 1);
-        decoder->Feed(frame.data, 0);
-        decoder->Feed({}, 0);
-        if (!decoder->Take()) {
-            throw std::runtime_error("no picture comes out of it");
-        }
-        std::vector<std::uint8_t> jpeg(base::kMaxFrameBytes);
-        jpeg.resize(decoder->Encode(jpeg, width));
-        return jpeg;
-    });
-}
-
 std::string At(const Call& call) {
     const std::int64_t width = call.NumberOr("width", kUsualWidth);
     if (width < kMinWidth || width > base::kMaxSidePixels) {
@@ -207,7 +170,8 @@ std::string At(const Call& call) {
         }
     }
     const std::int64_t captured = frame.capture_millis;
-    return ImageAnswer(SmallJpeg(call, std::move(frame), static_cast<int>(width)), captured, cache);
+    return ImageAnswer(SmallJpeg(call, frame.codec, std::move(frame.data), frame.width, static_cast<int>(width)),
+                       captured, cache);
 }
 
 constexpr Method kMethods[] = {{"Get", Get}, {"At", At}};

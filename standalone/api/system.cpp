@@ -1,9 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.System: how the installation is, for monitors. The web server offers the methods as /healthz and /metrics.
+// VEXO.System: how the installation is, for monitors, who find it at /healthz and /metrics; and what
+// was changed in it, for managers.
 #include <algorithm>
 #include <array>
 #include <limits>
+#include <memory>
+#include <utility>
+#include <vector>
 
 #include <json/json.h>
 
@@ -12,6 +16,7 @@
 #include "standalone/api/own_apis.h"
 #include "standalone/base/log.h"
 #include "standalone/base/text.h"
+#include "standalone/store/audit_log.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/settings.h"
 
@@ -19,6 +24,7 @@ namespace lookhaven::api {
 
 namespace {
 
+constexpr std::int64_t kMaxAuditEntries = 200;
 constexpr int kMonitorUserId = -1;  // all monitors together
 constexpr const char* kNoMonitor =
     "monitors must run on this machine or send the token of lookhaven setting set monitor-token";
@@ -97,7 +103,41 @@ std::string Metrics(const Call& call) {
            std::to_string(text.size()) + "\r\n\r\n" + text;
 }
 
-constexpr Method kMethods[] = {{"Health", Health}, {"Metrics", Metrics}};
+Json::Value FromText(const std::string& text) {
+    Json::Value value;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
+    return value;  // null for no text
+}
+
+std::string Audit(const Call& call) {
+    const std::int64_t before = call.NumberOr("before", 0);
+    const std::int64_t limit = call.NumberOr("limit", kMaxAuditEntries);
+    if (limit < 1 || limit > kMaxAuditEntries || !std::in_range<int>(before)) {
+        throw Failure(400, "limit must be 1 to 200, and before the id of an entry");
+    }
+    std::vector<store::AuditEntry> entries =
+        store::AuditLog(call.Records()).List(static_cast<int>(before), static_cast<int>(limit) + 1);
+    Json::Value data;
+    data["more"] = std::cmp_greater(entries.size(), limit);
+    entries.resize(std::min<std::size_t>(entries.size(), static_cast<std::size_t>(limit)));
+    Json::Value& list = data["entry"] = Json::arrayValue;
+    for (const store::AuditEntry& entry : entries) {
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = entry.id;
+        json["time"] = Json::Int64{entry.time_s};
+        json["who"] = entry.who;
+        json["address"] = entry.address;
+        json["action"] = entry.action;
+        json["object"] = entry.object;
+        json["before"] = FromText(entry.before);
+        json["after"] = FromText(entry.after);
+    }
+    return SuccessAnswer(data);
+}
+
+constexpr Method kMethods[] = {
+    {"Health", Health}, {"Metrics", Metrics}, {"Audit", Audit, Method::Effect::kChanges, Method::Audience::kManagers}};
 
 }  // namespace
 

@@ -118,14 +118,4 @@ std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media:
     return std::make_unique<IsolatedSource>(url, options, std::move(stop));
 }
 
-media::SourceKinds IsolatedKinds() {
-    media::SourceKinds kinds = media::CameraKinds();
-    for (auto& [beginning, opener] : kinds) {
-        if (beginning.ends_with("://")) {
-            opener = OpenIsolated;
-        }
-    }
-    return kinds;
-}
-
 }  // namespace lookhaven::camera

@@ -18,4 +18,9 @@ std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media:
 // media::CameraKinds, those of the network isolated.
 media::SourceKinds IsolatedKinds();
 
+// Those of the network alone, for a process without libav.
+inline media::SourceKinds NetworkKinds() {
+    return {{"rtsp://", OpenIsolated}, {"http://", OpenIsolated}, {"https://", OpenIsolated}};
+}
+
 }  // namespace lookhaven::camera

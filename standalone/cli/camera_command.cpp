@@ -1,21 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven camera: adds, lists, changes, removes and probes cameras.
-#include <chrono>
 #include <cstdio>
 
-#include "standalone/base/host_name.h"
+#include "standalone/admin/camera_stream.h"
+#include "standalone/admin/cameras.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/recording_hours.h"
 #include "standalone/cli/recording_options.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
-#include "standalone/media/probe.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/store/devices.h"
-#include "standalone/store/text.h"
-#include "standalone/store/transaction.h"
 
 namespace lookhaven::cli {
 
@@ -26,13 +24,13 @@ using store::Cameras;
 using store::RecordingPlan;
 using store::RecordingPlans;
 
-constexpr std::chrono::seconds kProbeTimeout{10};
-
 struct Request {
     int id = 0;
     std::string target;  // of a probe: an id or an address
     bool insecure = false;
     std::optional<std::string> account;
+    std::vector<std::string> hours;
+    bool deletes_footage = false;
     store::PortCounts ports;
     CameraOptions options;
     RecordingOptions recording;
@@ -76,17 +74,11 @@ Camera RequireCamera(Cameras& cameras, int id) {
     return Require(cameras.Find(id), "there is no camera ", id, ": see lookhaven camera list");
 }
 
-void RequireSource(const std::string& source) {
-    const media::SourceKinds kinds = pattern::AllSourceKinds();
-    if (media::FindKind(kinds, source) == nullptr || !store::IsSource(source)) {
-        throw Failure(kDataError, "a source begins with ", media::ListKinds(kinds),
-                      " and contains no account or password: give the account with --account");
-    }
-    const std::size_t host = source.find("://");
-    if (host != source.npos &&
-        !base::IsHostAndPort(source.substr(host + 3, source.find_first_of("/?#", host + 3) - host - 3))) {
-        throw Failure(kDataError, "the source ", source, " names no valid host or port");
-    }
+void RequireSource(const std::string& source) try {
+    admin::RequireSource(pattern::AllSourceKinds(), source);
+} catch (const store::InvalidRecord& error) {
+    const std::string_view sentence = error.what();
+    throw Failure(kDataError, sentence, sentence.ends_with("password") ? ": give the account with --account" : "");
 }
 
 void RequireSources(const Camera& camera) {
@@ -95,14 +87,13 @@ void RequireSources(const Camera& camera) {
     }
 }
 
+media::ProbeResult OpenAndProbe(const std::string& source, const media::SourceOptions& options) {
+    return media::ProbeSource(pattern::AllSourceKinds(), source, options);
+}
+
 media::ProbeResult Probe(const std::string& source, bool insecure,
                          const std::optional<store::Credentials>& credentials) {
-    RequireSource(source);
-    media::SourceOptions options{{}, kProbeTimeout, insecure};
-    if (credentials) {
-        options.credentials = {credentials->account, credentials->password};
-    }
-    return media::ProbeSource(pattern::AllSourceKinds(), source, options);
+    return admin::ProbeStream(OpenAndProbe, pattern::AllSourceKinds(), source, insecure, credentials);
 }
 
 // None without an account, and for an empty one, which removes the stored one.
@@ -113,81 +104,62 @@ std::optional<store::Credentials> AskCredentials(const Request& request) {
     return store::Credentials{*request.account, ReadPassword(*request.account, false)};
 }
 
-// Fills in what the options leave open. A source whose address tells its codec is not opened.
-void ProbeMissing(Camera& camera, const Request& request, const std::optional<store::Credentials>& credentials) {
-    const store::CameraProfile* live = camera.FindProfile(camera.live_profile);
-    if (request.options.HasType() || live == nullptr) {
-        return;
-    }
-    const std::string& source = live->source;
-    if (source.starts_with("http")) {
-        camera.video_type = base::Codec::kMjpeg;
-        return;
-    }
-    const media::ProbeResult found = Probe(source, camera.insecure, credentials);
-    if (!base::IsVideo(found.video.codec)) {
-        throw Failure(kDataError, "the source sends ", base::CodecName(found.video.codec),
-                      ", but only MJPEG, H.264 and H.265 are supported");
-    }
-    camera.video_type = found.video.codec;
-    if (!request.options.HasAudio()) {
-        camera.audio = found.audio.has_value();
+// Fills in what the options leave open.
+void ProbeMissing(admin::CameraSetup& setup, const Request& request) {
+    if (!request.options.HasType()) {
+        admin::FillInFromStream(setup, request.options.HasAudio(), OpenAndProbe, pattern::AllSourceKinds());
     }
 }
 
-void SetPlan(store::Store& store, int id, const Request& request, const RecordingPlan& plan) {
+void ApplyPlan(admin::CameraSetup& setup, const Request& request) {
     if (request.recording.IsGiven()) {
-        RecordingPlans(store).Set(id, plan);
+        RecordingPlan plan = setup.plan.value_or(RecordingPlan());
+        request.recording.ApplyTo(plan);
+        setup.plan = plan;
     }
 }
 
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Cameras cameras(store);
-    Camera camera;
+    admin::CameraSetup setup;
+    request.options.ApplyTo(setup.camera);
+    RequireSources(setup.camera);
+    setup = admin::AddCamera(store, {}, pattern::AllSourceKinds(), setup, [&](admin::CameraSetup& camera) {
+        camera.credentials = AskCredentials(request);
+        ProbeMissing(camera, request);
+        ApplyPlan(camera, request);
+    });
+    console.Answer(ToData(setup.camera, setup.plan.value_or(RecordingPlan())), "Added camera ", setup.camera.name,
+                   " with id ", setup.camera.id, "; it sends ", VideoTypeName(setup.camera.video_type), ".");
+}
+
+void Edit(admin::CameraSetup& setup, const Request& request) {
+    Camera& camera = setup.camera;
+    const Camera before = camera;
     request.options.ApplyTo(camera);
     RequireSources(camera);
-    const std::optional<store::Credentials> credentials = AskCredentials(request);
-    ProbeMissing(camera, request, credentials);
-    RecordingPlan plan;
-    request.recording.ApplyTo(plan);
-    store::InTransaction(store, [&] {
-        camera.id = cameras.Add(camera);
-        if (credentials) {
-            cameras.SetCredentials(camera.id, credentials);
-        }
-        SetPlan(store, camera.id, request, plan);
-    });
-    console.Answer(ToData(camera, plan), "Added camera ", camera.name, " with id ", camera.id, "; it sends ",
-                   VideoTypeName(camera.video_type), ".");
+    if (request.account) {
+        setup.credentials = AskCredentials(request);
+    }
+    const bool has_new_source =
+        camera.live_profile != before.live_profile || request.options.HasSource(camera.live_profile);
+    if (has_new_source || (request.account && setup.credentials)) {
+        ProbeMissing(setup, request);
+    }
+    if (!has_new_source && !request.options.HasAudio()) {
+        camera.audio = before.audio;  // the owner's choice
+    }
+    ApplyPlan(setup, request);
 }
 
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
-    Camera camera = RequireCamera(cameras, request.id);
-    const Camera before = camera;
-    request.options.ApplyTo(camera);
-    RequireSources(camera);
-    const std::optional<store::Credentials> credentials = AskCredentials(request);
-    const bool has_new_source =
-        camera.live_profile != before.live_profile || request.options.HasSource(camera.live_profile);
-    if (has_new_source || credentials) {
-        ProbeMissing(camera, request, request.account ? credentials : cameras.FindCredentials(camera.id));
-    }
-    if (!has_new_source && !request.options.HasAudio()) {
-        camera.audio = before.audio;  // the owner's choice
-    }
-    RecordingPlan plan = RecordingPlans(store).Find(camera.id);
-    request.recording.ApplyTo(plan);
-    store::InTransaction(store, [&] {
-        SetPlan(store, camera.id, request, plan);
-        cameras.Update(camera);
-        if (request.account) {
-            cameras.SetCredentials(camera.id, credentials);
-        }
-    });
-    console.Answer(ToData(camera, plan), "Changed camera ", camera.id, ".");
+    RequireCamera(cameras, request.id);
+    const admin::CameraSetup setup =
+        admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
+                         [&request](admin::CameraSetup& camera) { Edit(camera, request); });
+    console.Answer(ToData(setup.camera, setup.plan.value_or(RecordingPlan())), "Changed camera ", request.id, ".");
 }
 
 void List(const Console& console) {
@@ -204,8 +176,32 @@ void List(const Console& console) {
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Cameras(store).Remove(request.id);
-    console.Answer(Object("id", request.id), "Removed camera ", request.id, "; its recordings are kept.");
+    admin::RemoveCamera(store, {}, request.id, std::nullopt,
+                        request.deletes_footage ? admin::Footage::kRemove : admin::Footage::kKeep);
+    console.Answer(Object("id", request.id), "Removed camera ", request.id,
+                   request.deletes_footage ? "; the recorder deletes its recordings." : "; its recordings are kept.");
+}
+
+void Plan(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    Cameras cameras(store);
+    RequireCamera(cameras, request.id);
+    admin::CameraSetup setup = admin::ReadCamera(store, request.id);
+    if (!request.hours.empty()) {
+        setup = admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
+                                 [&request](admin::CameraSetup& camera) {
+                                     RecordingPlan plan = camera.plan.value_or(RecordingPlan());
+                                     plan.mode = store::RecordMode::kSchedule;
+                                     plan.hours = HoursOf(plan);
+                                     for (const std::string& span : request.hours) {
+                                         SetHours(plan.hours, span);
+                                     }
+                                     camera.plan = plan;
+                                 });
+    }
+    const Json::Value plan = PlanData(setup.plan.value_or(RecordingPlan()));
+    console.Answer(plan, "Recorded: ", plan["mode"].asString(), "\n",
+                   plan["mode"] == "schedule" ? HoursText(plan["hours"].asString()) : "");
 }
 
 void SetPorts(const Console& console, const Request& request) {
@@ -231,7 +227,7 @@ media::ProbeResult ProbeTarget(const Console& console, const Request& request) {
 }
 
 void ShowProbe(const Console& console, const Request& request) {
-    const auto [video, frames_per_second, audio] = ProbeTarget(console, request);
+    const auto [video, frames_per_second, audio, key_frame] = ProbeTarget(console, request);
     const char* codec = base::CodecName(video.codec);
     char fps[32];
     std::snprintf(fps, sizeof fps, "%.1f", frames_per_second);
@@ -269,7 +265,12 @@ void AddCamera(CLI::App& program, const Console& console) {
     set.Option("--account", request.account, account + "; empty for none");
 
     group.Add("list", "Lists the cameras", List);
-    group.Add("remove", "Removes a camera", Remove).Option("id", request.id, id, Required);
+    group.Add("remove", "Removes a camera", Remove)
+        .Option("id", request.id, id, Required)
+        .Flag("--delete-footage", request.deletes_footage, "Deletes its recordings, too, but for archived ones");
+    group.Add("plan", "Shows or sets in which hours of the week a camera is recorded", Plan)
+        .Option("id", request.id, id, Required)
+        .Option("hours", request.hours, "Such as \"mon-fri 8-18 always\" \"sat-sun alarm\"; later ones win");
     group.Add("ports", "Sets the number of a camera's digital inputs and outputs", SetPorts)
         .Option("id", request.id, id, Required)
         .Option("--inputs", request.ports.inputs, "Number of inputs (default: 0)")

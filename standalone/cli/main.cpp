@@ -5,6 +5,7 @@
 #include <new>
 #include <system_error>
 
+#include "standalone/admin/change.h"
 #include "standalone/archive/archive_error.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
@@ -74,8 +75,8 @@ int Run(int argc, char** argv) {
     program.add_option("--home", console.home_option,
                        "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
-    for (const auto add : {AddInit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddEmap, AddDevices,
-                           AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
+    for (const auto add : {AddInit, AddAudit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddEmap,
+                           AddDevices, AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);
@@ -91,6 +92,10 @@ int Run(int argc, char** argv) {
         return Report(console, kDataError, error.what());
     } catch (const store::NotFound& error) {
         return Report(console, kNoInput, error.what());
+    } catch (const admin::Stale& error) {
+        return Report(console, kDataError, error.what());
+    } catch (const admin::Forbidden& error) {
+        return Report(console, kNoPermission, error.what());
     } catch (const store::SchemaError& error) {
         return Report(console, kConfigError, error.what());
     } catch (const store::StoreError& error) {

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <limits>
 
+#include "standalone/base/local_time.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/units.h"
 
@@ -14,7 +15,8 @@ namespace {
 
 using store::RecordMode;
 
-const Names<RecordMode> kModes = {{"always", RecordMode::kAlways}, {"never", RecordMode::kNever}};
+const Names<RecordMode> kModes = {
+    {"always", RecordMode::kAlways}, {"never", RecordMode::kNever}, {"schedule", RecordMode::kSchedule}};
 
 // The store refuses what is too long, with the limit in its message.
 void AssignSeconds(int& target, const std::optional<std::string>& given) {
@@ -43,9 +45,14 @@ void RecordingOptions::ApplyTo(store::RecordingPlan& plan) const {
     plan.profile = profile_.value_or(plan.profile);
 }
 
+std::string HoursOf(const store::RecordingPlan& plan) {
+    return plan.hours.empty() ? std::string(base::kHoursOfWeek, static_cast<char>(store::HourMode::kAroundMarks))
+                              : plan.hours;
+}
+
 Json::Value PlanData(const store::RecordingPlan& plan) {
-    return Object("mode", plan.mode == RecordMode::kAlways ? "always" : "never", "segment", plan.segment_s, "pre",
-                  plan.pre_s, "post", plan.post_s, "mount_id", plan.mount_id, "profile", plan.profile);
+    return Object("mode", NameOf(kModes, static_cast<int>(plan.mode)), "segment", plan.segment_s, "pre", plan.pre_s,
+                  "post", plan.post_s, "mount_id", plan.mount_id, "profile", plan.profile, "hours", HoursOf(plan));
 }
 
 }  // namespace lookhaven::cli

@@ -32,6 +32,9 @@ class RecordingOptions {
     std::optional<int> profile_;
 };
 
+// The hours of a schedule, all of them.
+std::string HoursOf(const store::RecordingPlan& plan);
+
 Json::Value PlanData(const store::RecordingPlan& plan);
 
 }  // namespace lookhaven::cli

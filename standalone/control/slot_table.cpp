@@ -158,11 +158,19 @@ bool SlotTable::BeginSearch(Slot& slot, std::size_t max_of_user) {
 }
 
 bool SlotTable::BeginHashing(Slot& slot, std::size_t max_in_all) {
+    return BeginWork(slot, Work::kHashing, max_in_all);
+}
+
+bool SlotTable::BeginProbing(Slot& slot, std::size_t max_in_all) {
+    return BeginWork(slot, Work::kProbing, max_in_all);
+}
+
+bool SlotTable::BeginWork(Slot& slot, Work work, std::size_t max_in_all) {
     const SharedLock lock = TryLock(guard_->mutex);
-    if (!lock || CountOthers(slot, [](const Slot& each) { return each.work == Work::kHashing; }) >= max_in_all) {
+    if (!lock || CountOthers(slot, [work](const Slot& each) { return each.work == work; }) >= max_in_all) {
         return false;
     }
-    slot.work = Work::kHashing;
+    slot.work = work;
     return true;
 }
 

@@ -60,6 +60,7 @@ enum class Work : std::uint8_t {
     kNone,
     kSearch,   // may take seconds of a processor
     kHashing,  // of a password, in 64 MiB
+    kProbing,  // of a camera, by a process of its own
 };
 
 enum class Admission { kGranted, kTooManyOfUser, kTooMany };
@@ -113,7 +114,7 @@ class SlotTable {
     // Of the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
-    // For a request process, three ways to occupy something, each in one step among all processes: however many try at
+    // For a request process, four ways to occupy something, each in one step among all processes: however many try at
     // once, no more than the limit succeed.
     //
     // The request is the user's from here on. Counted are admitted requests.
@@ -122,6 +123,8 @@ class SlotTable {
     bool BeginSearch(Slot& slot, std::size_t max_of_user);
     // Until EndWork. False: no room.
     bool BeginHashing(Slot& slot, std::size_t max_in_all);
+    // Until the process ends. False: no room.
+    bool BeginProbing(Slot& slot, std::size_t max_in_all);
     static void EndWork(Slot& slot) { slot.work = Work::kNone; }
 
     // The sessions of running requests, unless they must end anyway.
@@ -170,6 +173,7 @@ class SlotTable {
     static std::uint64_t PackPause(std::uint64_t serial, const Pause& pause);
     static Pause UnpackPause(std::uint64_t word);
 
+    bool BeginWork(Slot& slot, Work work, std::size_t max_in_all);
     void EndAll(const std::function<bool(const Slot&)>& is_meant);
     // How many other requests there are that count.
     std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;

@@ -10,7 +10,7 @@ namespace lookhaven::control {
 
 namespace {
 
-constexpr std::uint64_t kVersion = 0x6c68'7374'6301;  // with the layout
+constexpr std::uint64_t kVersion = 0x6c68'7374'6302;  // with the layout
 constexpr std::size_t kMaxStreams = 1024;
 
 std::filesystem::path PathOf(const base::Installation& installation) {
@@ -21,6 +21,8 @@ struct Row {
     std::atomic<std::int64_t> stream;
     std::atomic<std::uint64_t> pictures;
     std::atomic<std::uint64_t> bytes;
+    std::atomic<double> pictures_per_second;
+    std::atomic<double> bytes_per_second;
     std::atomic<std::uint64_t> connections;
     std::atomic<std::int64_t> last_picture_us;
     std::atomic<bool> is_recorded;
@@ -33,6 +35,8 @@ void Store(Row& row, const StreamCounters& from) {
     row.stream = (std::int64_t{from.stream.camera} << 32) | static_cast<std::uint32_t>(from.stream.stream);
     row.pictures = from.pictures;
     row.bytes = from.bytes;
+    row.pictures_per_second = from.pictures_per_second;
+    row.bytes_per_second = from.bytes_per_second;
     row.connections = from.connections;
     row.last_picture_us = from.last_picture_us;
     row.is_recorded = from.is_recorded;
@@ -46,6 +50,8 @@ StreamCounters Load(const Row& row) {
     return {.stream = {static_cast<std::int32_t>(stream >> 32), static_cast<std::int32_t>(stream)},
             .pictures = row.pictures,
             .bytes = row.bytes,
+            .pictures_per_second = row.pictures_per_second,
+            .bytes_per_second = row.bytes_per_second,
             .connections = row.connections,
             .last_picture_us = row.last_picture_us,
             .is_recorded = row.is_recorded,

@@ -23,6 +23,8 @@ struct StreamCounters {
     LiveStream stream;
     std::uint64_t pictures = 0;
     std::uint64_t bytes = 0;           // of pictures and sound
+    double pictures_per_second = 0;    // over the last seconds, as is …
+    double bytes_per_second = 0;       // … this
     std::uint64_t connections = 0;     // attempts to reach the camera
     std::int64_t last_picture_us = 0;  // when the stream was started, before there is one
 

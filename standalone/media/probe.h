@@ -3,8 +3,10 @@
 // Finds out what a source sends.
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "standalone/media/source.h"
 
@@ -14,10 +16,16 @@ struct ProbeResult {
     StreamFormat video;
     double frames_per_second = 0;  // measured over the first second or so
     std::optional<StreamFormat> audio;
+    std::vector<std::uint8_t> key_frame;  // the first one; empty when none came meanwhile
 };
 
-// Opens the source and reads up to a second and a half of it. Throws SourceError when it cannot be opened or no picture
-// comes within the limit of the options.
-ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options);
+// Reads up to a second and a half of the source, or five where no key frame comes before. Throws SourceError when no
+// picture comes within the source's limit.
+ProbeResult Probe(Source& source);
+
+// Opens the source first. Throws SourceError.
+inline ProbeResult ProbeSource(const SourceKinds& kinds, const std::string& url, const SourceOptions& options) {
+    return Probe(*OpenSource(kinds, url, options, {}));
+}
 
 }  // namespace lookhaven::media

@@ -30,7 +30,8 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
                       {},
                       {},
                       camera.live_profile,
-                      camera.video_type};
+                      camera.video_type,
+                      plan.hours};
     if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id); mount && mount->enabled) {
         result.mount_id = mount->id;
         result.mount = mount->path;

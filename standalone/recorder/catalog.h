@@ -35,6 +35,7 @@ struct CameraPlan {
     std::string installation;                      // whose mounts are recorded to
     int live_profile = 0;                          // the profile that the live view shows, and …
     base::Codec video_type = base::Codec::kMjpeg;  // … what the store says that it sends
+    std::string hours = {};                        // as in store::RecordingPlan
 };
 
 struct CatalogContents {

@@ -7,6 +7,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/recorder/schedule.h"
 #include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::recorder {
@@ -47,7 +48,9 @@ std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogCont
     std::map<int, std::int64_t> until_s;
     const std::int64_t now_s = base::WallSeconds();
     for (const store::Mark& mark : rows_.PendingMarks()) {
-        if (catalog.cameras.contains(mark.camera_id) && mark.start_s <= now_s && now_s < mark.end_s) {
+        const auto plan = catalog.cameras.find(mark.camera_id);
+        if (plan != catalog.cameras.end() && mark.start_s <= now_s && now_s < mark.end_s &&
+            TakesMarkAt(plan->second, mark.moment_s)) {
             until_s[mark.camera_id] = std::max(until_s[mark.camera_id], mark.end_s);
         }
     }
@@ -57,6 +60,10 @@ std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogCont
 void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     const std::size_t cameras = entries_.size();
     const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
+    std::map<int, CameraPlan> plans;
+    for (const auto& [camera, plan] : catalog.cameras) {
+        plans.emplace(camera, PlanAt(plan, base::WallSeconds()));
+    }
     std::erase_if(entries_,
                   [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
     const auto needs = [&](int camera, const CameraPlan& plan) {
@@ -64,13 +71,13 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
                (plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera));
     };
     for (auto& [camera, entry] : entries_) {
-        const auto plan = catalog.cameras.find(camera);
-        if (!entry.is_ending && (plan == catalog.cameras.end() || !needs(camera, plan->second))) {
+        const auto plan = plans.find(camera);
+        if (!entry.is_ending && (plan == plans.end() || !needs(camera, plan->second))) {
             entry.is_ending = true;
             entry.worker->RequestStop();
         }
     }
-    for (const auto& [camera, plan] : catalog.cameras) {
+    for (const auto& [camera, plan] : plans) {
         if (!needs(camera, plan)) {
             continue;
         }

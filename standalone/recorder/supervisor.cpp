@@ -133,14 +133,20 @@ std::map<int, CameraSignal> Supervisor::Signals() const {
 }
 
 void Supervisor::PublishCounters() {
+    const std::int64_t now_us = base::MonotonicMicros();
     std::vector<control::StreamCounters> streams;
     streams.reserve(workers_.size());
+    std::erase_if(rates_, [this](const auto& rate) { return !workers_.contains(rate.first); });
     for (const auto& [stream, worker] : workers_) {
         const StreamCounts counts = worker->Counts();
         control::StreamCounters& published = streams.emplace_back();
         published.stream = stream;
         published.pictures = counts.pictures;
         published.bytes = counts.bytes;
+        StreamRate& rate = rates_[stream];
+        rate.Note(counts, now_us);
+        published.pictures_per_second = rate.PicturesPerSecond();
+        published.bytes_per_second = rate.BytesPerSecond();
         published.connections = counts.connections;
         published.last_picture_us = counts.last_picture_us;
         recordings_.AddCounters(published);

@@ -18,6 +18,7 @@
 #include "standalone/control/stream_counters.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/recording_supervisor.h"
+#include "standalone/recorder/stream_rate.h"
 #include "standalone/recorder/stream_worker.h"
 
 namespace lookhaven::recorder {
@@ -55,6 +56,7 @@ class Supervisor {
     Catalog catalog_;
     RecordingSupervisor recordings_;
     std::map<control::LiveStream, std::unique_ptr<StreamWorker>> workers_;
+    std::map<control::LiveStream, StreamRate> rates_;
     std::int64_t next_second_us_ = 0;
     std::int64_t seconds_ = 0;
     bool common_config_refreshed_ = true;

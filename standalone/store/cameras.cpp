@@ -95,7 +95,7 @@ std::vector<Camera> FetchCameras(Connection& connection, const std::string& cond
         Query<std::pair<Camera, ProfileRow>>(
             sql, kOnce,
             std::string("select ") + Mapping<Camera>::kColumns + ", " + Mapping<ProfileRow>::kColumns +
-                " from cameras join camera_profiles on camera_id = id " + condition + " order by id, number",
+                " from cameras join camera_profiles on camera_id = id " + condition + " order by place, id, number",
             parameters...)
             .ForEach([&](const auto& row) {
                 if (cameras.empty() || cameras.back().id != row.first.id) {
@@ -121,6 +121,7 @@ int Cameras::Add(const Camera& camera) {
         Camera added = camera;
         added.id = NextId(sql, "camera");
         Insert(sql, added);
+        Execute(sql, "update cameras set place = id where id = :id", added.id);
         ReplaceProfiles(sql, added);
         RaiseRevision(sql);
         return added.id;
@@ -162,6 +163,19 @@ std::optional<Camera> Cameras::Find(int id) {
 
 std::vector<Camera> Cameras::List() {
     return FetchCameras(connection_, "");
+}
+
+void Cameras::SetOrder(const std::vector<int>& ids) {
+    connection_.Write([&](soci::session& sql) {
+        RaiseRevision(sql);
+        std::vector<int> given = ids;
+        std::ranges::sort(given);
+        RequireRule(given == FetchAll<int>(sql, "select id from cameras order by id"),
+                    "an order names every camera, each once");
+        for (int place = 1; const int id : ids) {
+            Execute(sql, "update cameras set place = :place where id = :id", place++, id);
+        }
+    });
 }
 
 void Cameras::SetCredentials(int id, const std::optional<Credentials>& credentials) {

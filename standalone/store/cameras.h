@@ -66,7 +66,9 @@ class Cameras {
     void Remove(int id);
 
     std::optional<Camera> Find(int id);
-    std::vector<Camera> List();  // by id
+    std::vector<Camera> List();  // in their order; a new camera comes last
+    // ids: all cameras, each once. Throws InvalidRecord.
+    void SetOrder(const std::vector<int>& ids);
 
     // nullopt removes them. Throws InvalidRecord, or NotFound for an unknown camera.
     void SetCredentials(int id, const std::optional<Credentials>& credentials);

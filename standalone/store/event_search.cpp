@@ -198,6 +198,23 @@ MountContent Events::Content(int mount_id) {
     return {events, size_bytes};
 }
 
+std::map<int, CameraFootage> Events::FootageOfCameras(int camera_id) {
+    std::map<int, CameraFootage> footage;
+    connection_.Read([&](soci::session& sql) {
+        Query<std::tuple<int, std::int64_t, std::int64_t, std::int64_t>>(
+            sql, kOnce,
+            "select camera_id, count(*), cast(sum(size_bytes) as bigint), min(start_s) from events where demo = 0"
+            " and " +
+                std::string(camera_id == 0 ? "0" : "camera_id") + " = :camera group by camera_id",
+            camera_id)
+            .ForEach([&footage](const auto& row) {
+                const auto& [camera, events, size_bytes, oldest_s] = row;
+                footage[camera] = {events, size_bytes, oldest_s};
+            });
+    });
+    return footage;
+}
+
 // Steps from camera to camera in the index instead of reading all of it.
 std::set<int> Events::CamerasOn(int mount_id) {
     const std::string from = mount_id == 0 ? " from events where 0 = " : " from events where mount_id = ";

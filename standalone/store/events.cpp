@@ -135,6 +135,16 @@ void Events::BeginDeletion(std::span<const int> ids) {
     Move(connection_, ids, "events", "events_pending_deletion", " and recording = 0 and archived = 0");
 }
 
+void Events::BeginDeletionOfCamera(int camera_id) {
+    const std::string columns = Mapping<Event>::kColumns;
+    const std::string which = " from events where recording = 0 and archived = 0 and demo = 0 and camera_id = :camera";
+    connection_.Write([&](soci::session& sql) {
+        Execute(sql, "insert into events_pending_deletion (" + columns + ") select " + columns + which, camera_id);
+        Execute(sql, "delete" + which, camera_id);
+        Execute(sql, "delete from events where demo = 1 and camera_id = :camera", camera_id);
+    });
+}
+
 void Events::FinishDeletion(std::span<const int> ids) {
     connection_.Write(
         [&](soci::session& sql) { ForEachId(sql, ids, "delete from events_pending_deletion where id = :id"); });

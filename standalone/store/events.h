@@ -13,6 +13,7 @@
 #include <cstdint>
 #include <functional>
 #include <limits>
+#include <map>
 #include <optional>
 #include <set>
 #include <span>
@@ -90,6 +91,13 @@ struct MountContent {
     std::int64_t size_bytes = 0;
 };
 
+// What there is of a camera, without demo events.
+struct CameraFootage {
+    std::int64_t events = 0;
+    std::int64_t size_bytes = 0;
+    std::int64_t oldest_s = 0;  // where the oldest begins
+};
+
 class Events {
   public:
     using Visitor = std::function<void(const Event&)>;
@@ -124,6 +132,8 @@ class Events {
     void FinishDeletion(std::span<const int> ids);
     void CancelDeletion(std::span<const int> ids);     // the rows are as before
     std::vector<Event> PendingDeletion(int mount_id);  // by id
+    // BeginDeletion of all of the camera's events; its demo events go at once.
+    void BeginDeletionOfCamera(int camera_id);
     // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call
     // removes.
     int RemoveDemo();
@@ -156,6 +166,8 @@ class Events {
     MountContent Content(int mount_id);
     // The cameras, removed ones too, that have events on the mount; mount 0: on any.
     std::set<int> CamerasOn(int mount_id);
+    // By camera, those without any left out. camera_id 0: of all, which reads every row: half a second for a million.
+    std::map<int, CameraFootage> FootageOfCameras(int camera_id = 0);
 
   private:
     Connection& connection_;

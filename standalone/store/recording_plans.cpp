@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/recording_plans.h"
 
+#include "standalone/base/local_time.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/connection.h"
 
@@ -11,10 +12,12 @@ using PlanRow = std::pair<int, RecordingPlan>;
 template <>
 struct Mapping<PlanRow> {
     static constexpr const char* kTable = "recording_plans";
-    static constexpr const char* kColumns = "camera_id, mode, segment, pre_record, post_record, mount_id, profile";
+    static constexpr const char* kColumns =
+        "camera_id, mode, segment, pre_record, post_record, mount_id, profile, hours";
     static auto Members(auto& row) {
         auto& [camera_id, plan] = row;
-        return std::tie(camera_id, plan.mode, plan.segment_s, plan.pre_s, plan.post_s, plan.mount_id, plan.profile);
+        return std::tie(camera_id, plan.mode, plan.segment_s, plan.pre_s, plan.post_s, plan.mount_id, plan.profile,
+                        plan.hours);
     }
 };
 
@@ -25,8 +28,12 @@ bool IsWithin(int value, int first, int last) {
 }
 
 void RequirePlan(const RecordingPlan& plan) {
-    if (plan.mode != RecordMode::kNever && plan.mode != RecordMode::kAlways) {
-        throw InvalidRecord("a camera is recorded always or never");
+    if (!IsWithin(static_cast<int>(plan.mode), 0, static_cast<int>(RecordMode::kSchedule))) {
+        throw InvalidRecord("a camera is recorded always, never or by a schedule");
+    }
+    if (!plan.hours.empty() &&
+        (plan.hours.size() != base::kHoursOfWeek || plan.hours.find_first_not_of("012") != plan.hours.npos)) {
+        throw InvalidRecord("a schedule has 168 hours, each of them 0 (never), 1 (always) or 2 (on alarm)");
     }
     if (!IsWithin(plan.segment_s, kMinSegmentSeconds, kMaxSegmentSeconds)) {
         throw InvalidRecord("a recording is cut into pieces of 10 to 3600 seconds");
@@ -40,6 +47,19 @@ void RequirePlan(const RecordingPlan& plan) {
 }
 
 }  // namespace
+
+HourMode ModeOfHour(RecordMode mode, const std::string& hours, int hour_of_week) {
+    if (mode == RecordMode::kAlways) {
+        return HourMode::kAlways;
+    }
+    return mode == RecordMode::kNever || hours.empty()
+               ? HourMode::kAroundMarks
+               : static_cast<HourMode>(hours.at(static_cast<std::size_t>(hour_of_week)));
+}
+
+HourMode RecordingPlan::At(std::int64_t time_s) const {
+    return ModeOfHour(mode, hours, base::LocalHourOfWeek(time_s));
+}
 
 void RecordingPlans::Set(int camera_id, const RecordingPlan& plan) {
     RequirePlan(plan);

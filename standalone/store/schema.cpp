@@ -176,6 +176,16 @@ constexpr const char* kAuditLog[] = {
     " before_change text not null, after_change text not null)",
 };
 
+// Ids grow, so that a new camera comes last.
+constexpr const char* kCameraOrder[] = {
+    "alter table cameras add column place integer not null default 0",
+    "update cameras set place = id",
+};
+
+constexpr const char* kSchedules[] = {
+    "alter table recording_plans add column hours text not null default ''",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -188,6 +198,8 @@ constexpr Migration kMigrations[] = {
     {"sessions whose secret carries a tag", kTaggedSessions},
     {"alarms among continuous recordings", kAlarms},
     {"the audit log", kAuditLog},
+    {"the order of cameras", kCameraOrder},
+    {"recording by the hour of the week", kSchedules},
 };
 
 }  // namespace

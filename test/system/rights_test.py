@@ -22,6 +22,12 @@ TABLE = """
 Auth.Status                                                           E      E     D       D     D    D       D        D      D       E
 Auth.Login                                                            M      M     M       M     M    M       M        M      M       M
 Auth.Logout                                                           M      M     M       M     M    M       M        M      M       M
+POST Camera.List                                                      E      E     F       F     F    F       F        F      D       E
+POST Camera.Probe address=rtsp://127.0.0.1:1/                         E      E     F       F     F    F       F        F      D       E
+POST Camera.Add name=x source=[]                                      E      E     F       F     F    F       F        F      B       E
+POST Camera.Set id={camera} revision=1                                E      E     F       F     F    F       F        F      C/N     E
+POST Camera.Remove id={camera} revision=1 footage=keep                E      E     F       F     F    F       F        F      C/N     E
+POST Camera.Order id=[]                                               E      E     F       F     F    F       F        F      B       E
 Catalog.Groups: camera                                                E      E     D       O     D    D       D        D      D       E
 Catalog.CameraStates: camera                                          E      E     D       O     D    D       D        D      D       E
 Catalog.Mounts: camera                                                E      E     D       O     D    D       D        D      D       E
@@ -51,6 +57,7 @@ POST Playback.Stop timestamp=1                                        E      E  
 Relay.Play server=2 camera={camera}                                   E      E     S/N     N     D/N  S/N     S/N      S/N    S/N     E
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
+POST System.Audit                                                     E      E     F       F     F    F       F        F      D       E
 Player.LoadCamera: camera                                             E      E     D       O     D    D       D        D      D       E
 Player.SearchAvaiDate cameralists={camera} start=-1d day_count=2: day E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Player.EnumEvent cameralists={camera} from=-1d to=now: event          E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E

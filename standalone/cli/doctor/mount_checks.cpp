@@ -102,7 +102,7 @@ std::map<int, int> CountCamerasByMount(store::Store& store) {
     store::Mounts mounts(store);
     for (const store::Camera& camera : store::Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
-        if (camera.enabled && plan != plans.end() && plan->second.mode == store::RecordMode::kAlways) {
+        if (camera.enabled && plan != plans.end() && plan->second.mode != store::RecordMode::kNever) {
             const auto mount = mounts.FindForPlan(plan->second.mount_id);
             ++cameras[mount ? mount->id : 0];
         }

@@ -72,12 +72,14 @@ TEST_P(ChangeTest, OfAStaleRecordIsToldTheCurrentOne) {
     RequireCurrent(record, seen);
     RequireCurrent(record, std::nullopt);
     record["name"] = "Yard";
+    record["revision"] = Json::Int64{RevisionOf(record)};
     try {
         RequireCurrent(record, seen);
         ADD_FAILURE() << "it has changed";
     } catch (const Stale& stale) {
         EXPECT_EQ(stale.Record(), record);
     }
+    EXPECT_EQ(RevisionOf(record), record["revision"].asInt64()) << "which is no part of what it tells of";
     EXPECT_LT(RevisionOf(record), std::int64_t{1} << 48);
 }
 

@@ -5,6 +5,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/recorder/backoff.h"
+#include "standalone/recorder/stream_rate.h"
 #include "standalone/recorder/stream_rings.h"
 #include "standalone/ring/inventory.h"
 #include "test/support/footage/archive_folder.h"
@@ -31,6 +32,26 @@ TEST(Backoff, GrowsToItsCapAndStartsOverAfterStableFlow) {
         backoff.NotePicture(now_us + std::chrono::microseconds(Backoff::kStable).count());
         EXPECT_LE(backoff.DelayAfterFailure(), Backoff::kMinDelay);
     }
+}
+
+TEST(StreamRate, FollowsWhatComesAndStartsOverWithTheStream) {
+    StreamRate rate;
+    StreamCounts counts;
+    std::int64_t now_us = 1;
+    const auto pass = [&](std::uint64_t pictures, int seconds) {
+        for (; seconds > 0; --seconds) {
+            counts.pictures += pictures, counts.bytes += pictures * 1000;
+            rate.Note(counts, now_us += 1'000'000);
+        }
+        return rate.PicturesPerSecond();
+    };
+    pass(0, 1);
+    EXPECT_DOUBLE_EQ(pass(25, 1), 25) << "at once";
+    EXPECT_DOUBLE_EQ(rate.BytesPerSecond(), 25'000);
+    EXPECT_LT(pass(0, 20), 0.1);
+    counts = {};
+    EXPECT_LT(pass(1, 1), 1) << "a stream that was started anew counts from 0";
+    EXPECT_NEAR(pass(10, 20), 10, 0.5);
 }
 
 TEST(StreamRings, FitTheSizeOfTheLatestFormat) {

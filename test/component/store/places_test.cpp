@@ -89,20 +89,23 @@ TEST_P(PlaceTest, PlansAreKeptPerCameraAndRefusedWhenTheyBreakARule) {
     const int mount = AddMount("first", "/srv/a");
     EXPECT_EQ(plans_.Find(camera).segment_s, 300) << "without one of its own";
     const std::int64_t before = Settings(store_).Revision();
-    plans_.Set(camera, {RecordMode::kAlways, 10, 0, 300, mount, 2});
+    plans_.Set(camera, {RecordMode::kAlways, 10, 0, 300, mount, 2, std::string(168, '2')});
     EXPECT_EQ(Settings(store_).Revision(), before + 1);
     const RecordingPlan found = plans_.List().at(camera);
+    EXPECT_EQ(found.hours, std::string(168, '2'));
     EXPECT_THAT(std::vector({static_cast<int>(found.mode), found.segment_s, found.pre_s, found.post_s, found.mount_id,
                              found.profile}),
                 ElementsAre(1, 10, 0, 300, mount, 2));
-    for (const RecordingPlan& plan : std::initializer_list<RecordingPlan>{{.mode = static_cast<RecordMode>(2)},
+    for (const RecordingPlan& plan : std::initializer_list<RecordingPlan>{{.mode = static_cast<RecordMode>(3)},
                                                                           {.segment_s = 9},
                                                                           {.segment_s = 3601},
                                                                           {.pre_s = -1},
                                                                           {.pre_s = 301},
                                                                           {.post_s = 301},
                                                                           {.profile = 3},
-                                                                          {.profile = -1}}) {
+                                                                          {.profile = -1},
+                                                                          {.hours = "0"},
+                                                                          {.hours = std::string(168, '3')}}) {
         EXPECT_THROW(plans_.Set(camera, plan), InvalidRecord) << plan.segment_s << " " << plan.pre_s;
     }
     EXPECT_THROW(plans_.Set(camera, {.mount_id = 99}), NotFound);

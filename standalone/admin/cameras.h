@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Changes of cameras: what belongs to one is checked as a whole, and stored as a whole or not at all.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <json/json.h>
+
+#include "standalone/admin/actor.h"
+#include "standalone/media/source.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/recording_plans.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::admin {
+
+// All that is stored of a camera, its password included.
+struct CameraSetup {
+    store::Camera camera;  // id 0 before it is added
+    std::optional<store::Credentials> credentials;
+    std::optional<store::RecordingPlan> plan;  // nothing: it is not recorded, and not kept ready for marks
+    std::set<int> groups;
+};
+
+// Changes a setup; whatever it throws ends the change.
+using CameraEdit = std::function<void(CameraSetup&)>;
+
+// Throws store::InvalidRecord for an address that begins with none of the kinds, names no valid host or port, or holds
+// an account or password.
+void RequireSource(const media::SourceKinds& kinds, const std::string& source);
+
+// Throws store::NotFound.
+CameraSetup ReadCamera(store::Store& store, int id);
+
+// As pages of the web API show it, without password and with its revision. What the recorder finds out by itself (the
+// codec) and the order of cameras are no part of the revision.
+Json::Value ToJson(const CameraSetup& setup);
+
+// Each of these checks the addresses that are new; where one throws, nothing was changed. They throw what Apply throws,
+// InvalidRecord, NotFound, and Stale, whose record is that of ToJson, for another revision than the one seen and for a
+// change made by somebody else while the edit ran.
+//
+// prepare: may look at the stream, which takes seconds, and fill in what it finds. Called before anything is stored.
+CameraSetup AddCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, CameraSetup setup,
+                      const CameraEdit& prepare = {});
+CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, int id,
+                      std::optional<std::int64_t> seen, const CameraEdit& edit);
+
+enum class Footage { kKeep, kRemove };
+// kRemove: the recordings are out of every search at once, and the recorder deletes the files by and by. Archived ones
+// stay. Waits up to five seconds for the recorder to finish what it is writing; what it has not finished then stays.
+void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen, Footage footage);
+
+// ids: all cameras, each once.
+void OrderCameras(store::Store& store, const Actor& actor, const std::vector<int>& ids);
+
+}  // namespace lookhaven::admin

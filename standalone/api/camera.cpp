@@ -1,0 +1,162 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Camera: cameras as a manager sets them up: look at an address, add, change, order, remove.
+#include "standalone/api/own_apis.h"
+
+#include <array>
+#include <utility>
+
+#include "standalone/admin/cameras.h"
+#include "standalone/admin/change.h"
+#include "standalone/api/camera_fields.h"
+#include "standalone/api/camera_page.h"
+#include "standalone/api/probe.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+// Where cameras of many makes have their streams.
+constexpr std::array<std::pair<const char*, const char*>, 12> kUsualPaths{{
+    {"first stream", "/stream1"},
+    {"second stream", "/stream2"},
+    {"first channel, first stream", "/Streaming/Channels/101"},
+    {"first channel, second stream", "/Streaming/Channels/102"},
+    {"channel 1, main stream", "/cam/realmonitor?channel=1&subtype=0"},
+    {"channel 1, sub stream", "/cam/realmonitor?channel=1&subtype=1"},
+    {"live, channel 0", "/live/ch0"},
+    {"live, channel 1", "/live/ch1"},
+    {"profile 1", "/media/video1"},
+    {"profile 2", "/media/video2"},
+    {"H.264", "/h264"},
+    {"live", "/live"},
+}};
+
+template <typename Record>
+Json::Value NamedList(const std::vector<Record>& records) {
+    Json::Value list = Json::arrayValue;
+    for (const Record& record : records) {
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = record.id;
+        json["name"] = record.name;
+    }
+    return list;
+}
+
+std::string List(const Call& call) {
+    bool counts_footage = true;
+    TakeField(call, "footage", counts_footage);
+    store::Store& records = call.Records();
+    const CameraPage page(call, counts_footage ? std::optional(0) : std::nullopt);
+    Json::Value data;
+    data["camera"] = Json::arrayValue;
+    for (const store::Camera& camera : page.Cameras()) {
+        page.Complete(data["camera"].append(admin::ToJson(admin::ReadCamera(records, camera.id))));
+    }
+    data["group"] = NamedList(store::Groups(records).List());
+    const std::vector<store::Mount> mounts = store::Mounts(records).List();
+    data["mount"] = NamedList(mounts);
+    for (Json::ArrayIndex i = 0; i < data["mount"].size(); ++i) {
+        data["mount"][i]["default"] = mounts[i].is_default;
+    }
+    data["path"] = Json::arrayValue;
+    for (const auto& [name, path] : kUsualPaths) {
+        Json::Value& json = data["path"].append(Json::objectValue);
+        json["name"] = name;
+        json["path"] = path;
+    }
+    return SuccessAnswer(data);
+}
+
+Json::Value Completed(const Call& call, Json::Value record) {
+    CameraPage(call, record["id"].asInt()).Complete(record);
+    return record;
+}
+
+std::string CameraAnswer(const Call& call, const admin::CameraSetup& setup) {
+    Json::Value data;
+    data["camera"] = Completed(call, admin::ToJson(setup));
+    return SuccessAnswer(data);
+}
+
+std::int64_t RequireNumber(const Call& call, const char* name) {
+    const Json::Value& value = call.Parameter(name);
+    if (!value.isInt64()) {
+        throw Failure(400, std::string(name) + " must be a number");
+    }
+    return value.asInt64();
+}
+
+int RequireId(const Call& call) {
+    const std::int64_t id = RequireNumber(call, "id");
+    if (!std::in_range<int>(id)) {
+        throw Failure(404, kNoSuchCamera);
+    }
+    return static_cast<int>(id);
+}
+
+// Calls change; a page that saw an older revision is told the record as List would.
+template <typename Change>
+auto OrStale(const Call& call, Change&& change) {
+    try {
+        return change();
+    } catch (const admin::Stale& stale) {
+        throw Failure(409, stale.what(), 0, admin::ToText(Completed(call, stale.Record())));
+    }
+}
+
+std::string Add(const Call& call) {
+    admin::CameraSetup setup;
+    setup.camera.enabled = true;
+    TakeCameraFields(call, setup);
+    setup = admin::AddCamera(call.Records(), call.Actor(), camera::NetworkKinds(), setup);
+    return CameraAnswer(call, setup);
+}
+
+std::string Set(const Call& call) {
+    return OrStale(call, [&] {
+        return CameraAnswer(call, admin::SetCamera(call.Records(), call.Actor(), camera::NetworkKinds(),
+                                                   RequireId(call), RequireNumber(call, "revision"),
+                                                   [&](admin::CameraSetup& setup) { TakeCameraFields(call, setup); }));
+    });
+}
+
+std::string Remove(const Call& call) {
+    const Json::Value& footage = call.Parameter("footage");
+    if (footage != "keep" && footage != "remove") {
+        throw Failure(400, "footage must be keep or remove");
+    }
+    return OrStale(call, [&] {
+        admin::RemoveCamera(call.Records(), call.Actor(), RequireId(call), RequireNumber(call, "revision"),
+                            footage == "keep" ? admin::Footage::kKeep : admin::Footage::kRemove);
+        return SuccessAnswer(Json::objectValue);
+    });
+}
+
+std::string Order(const Call& call) {
+    const Json::Value& list = call.Parameter("id");
+    if (!list.isArray()) {
+        throw Failure(400, "id must be a list of all cameras");
+    }
+    std::vector<int> ids;
+    for (const Json::Value& id : list) {
+        ids.push_back(id.asInt());
+    }
+    admin::OrderCameras(call.Records(), call.Actor(), ids);
+    return SuccessAnswer(Json::objectValue);
+}
+
+using enum Method::Effect;
+using enum Method::Audience;
+
+constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},     {"Probe", ProbeCamera, kChanges, kManagers},
+                               {"Add", Add, kChanges, kManagers},       {"Set", Set, kChanges, kManagers},
+                               {"Remove", Remove, kChanges, kManagers}, {"Order", Order, kChanges, kManagers}};
+
+}  // namespace
+
+const OwnApi kCameraApi{"VEXO.Camera", kMethods};
+
+}  // namespace lookhaven::api

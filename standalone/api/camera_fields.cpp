@@ -1,0 +1,199 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/camera_fields.h"
+
+#include <algorithm>
+#include <map>
+#include <set>
+#include <utility>
+#include <vector>
+
+namespace lookhaven::api {
+
+namespace {
+
+using store::CameraProfile;
+using store::RecordingPlan;
+
+[[noreturn]] void Refuse(const std::string& name, const std::string& what) {
+    throw Failure(400, name + " must be " + what);
+}
+
+void Take(const Json::Value& value, const std::string& name, bool& target) {
+    if (!value.isNull() && !value.isBool()) {
+        Refuse(name, "true or false");
+    }
+    target = value.isNull() ? target : value.asBool();
+}
+
+void Take(const Json::Value& value, const std::string& name, int& target) {
+    if (!value.isNull() && !value.isInt()) {
+        Refuse(name, "a whole number");
+    }
+    target = value.isNull() ? target : value.asInt();
+}
+
+void Take(const Json::Value& value, const std::string& name, std::string& target) {
+    if (!value.isNull() && !value.isString()) {
+        Refuse(name, "a text");
+    }
+    target = value.isNull() ? target : value.asString();
+}
+
+template <typename Value>
+void TakeNamed(const Json::Value& value, const std::string& name, const std::map<std::string, Value>& names,
+               Value& target) {
+    if (value.isNull()) {
+        return;
+    }
+    const auto found = value.isString() ? names.find(value.asString()) : names.end();
+    if (found == names.end()) {
+        std::string list;
+        for (const auto& [each, meaning] : names) {
+            list += (list.empty() ? "" : ", ") + each;
+        }
+        Refuse(name, "one of " + list);
+    }
+    target = found->second;
+}
+
+const std::map<std::string, base::Codec> kCodecs = {
+    {"mjpeg", base::Codec::kMjpeg}, {"h264", base::Codec::kH264}, {"h265", base::Codec::kH265}};
+const std::map<std::string, store::RecordMode> kModes = {{"always", store::RecordMode::kAlways},
+                                                         {"never", store::RecordMode::kNever},
+                                                         {"schedule", store::RecordMode::kSchedule}};
+
+// A profile keeps what the list does not say of it.
+void TakeSources(const Json::Value& list, store::Camera& camera) {
+    if (list.isNull()) {
+        return;
+    }
+    if (!list.isArray()) {
+        Refuse("source", "a list");
+    }
+    std::vector<CameraProfile> profiles;
+    for (const Json::Value& source : list) {
+        if (!source.isObject()) {
+            Refuse("source", "a list of objects");
+        }
+        int number = 0;
+        Take(source["profile"], "source.profile", number);
+        const CameraProfile* known = camera.FindProfile(number);
+        CameraProfile profile = known == nullptr ? CameraProfile{number, "", 0, 0, 0} : *known;
+        Take(source["address"], "source.address", profile.source);
+        Take(source["width"], "source.width", profile.width);
+        Take(source["height"], "source.height", profile.height);
+        Take(source["fps"], "source.fps", profile.fps);
+        profiles.push_back(profile);
+    }
+    std::ranges::sort(profiles, {}, &CameraProfile::number);
+    camera.profiles = std::move(profiles);
+}
+
+void TakePlan(const Json::Value& json, std::optional<RecordingPlan>& stored) {
+    if (json.isNull()) {
+        return;
+    }
+    if (!json.isObject()) {
+        Refuse("plan", "an object");
+    }
+    RecordingPlan plan = stored.value_or(RecordingPlan());
+    TakeNamed(json["mode"], "plan.mode", kModes, plan.mode);
+    Take(json["hours"], "plan.hours", plan.hours);
+    Take(json["segment"], "plan.segment", plan.segment_s);
+    Take(json["pre"], "plan.pre", plan.pre_s);
+    Take(json["post"], "plan.post", plan.post_s);
+    Take(json["mount"], "plan.mount", plan.mount_id);
+    Take(json["profile"], "plan.profile", plan.profile);
+    stored = plan;
+}
+
+void TakeGroups(const Json::Value& list, std::set<int>& groups) {
+    if (list.isNull()) {
+        return;
+    }
+    if (!list.isArray()) {
+        Refuse("group", "a list");
+    }
+    groups.clear();
+    for (const Json::Value& id : list) {
+        int group = 0;
+        Take(id, "group", group);
+        groups.insert(group);
+    }
+}
+
+std::string HostOf(const std::string& address) {
+    const std::size_t scheme = address.find("://");
+    if (scheme == address.npos) {
+        return "";
+    }
+    const std::string rest = address.substr(scheme + 3, address.find_first_of("/?#", scheme + 3) - scheme - 3);
+    return rest.substr(0, rest.starts_with('[') ? rest.find(']') : rest.find(':'));
+}
+
+std::set<std::string> HostsOf(const store::Camera& camera) {
+    std::set<std::string> hosts;
+    for (const CameraProfile& profile : camera.profiles) {
+        hosts.insert(HostOf(profile.source));
+    }
+    return hosts;
+}
+
+std::string LiveAddress(const store::Camera& camera) {
+    const CameraProfile* live = camera.FindProfile(camera.live_profile);
+    return live == nullptr ? "" : live->source;
+}
+
+}  // namespace
+
+void TakeField(const Call& call, const char* name, bool& target) {
+    Take(call.Parameter(name), name, target);
+}
+
+void TakeField(const Call& call, const char* name, int& target) {
+    Take(call.Parameter(name), name, target);
+}
+
+void TakeField(const Call& call, const char* name, std::string& target) {
+    Take(call.Parameter(name), name, target);
+}
+
+std::optional<store::Credentials> TakeCredentials(const Call& call, const admin::CameraSetup& stored,
+                                                  const std::vector<std::string>& addresses) {
+    store::Credentials credentials = stored.credentials.value_or(store::Credentials());
+    TakeField(call, "account", credentials.account);
+    TakeField(call, "password", credentials.password);
+    const std::set<std::string> hosts = HostsOf(stored.camera);
+    const bool goes_elsewhere = std::ranges::any_of(
+        addresses, [&hosts](const std::string& address) { return !hosts.contains(HostOf(address)); });
+    if (goes_elsewhere && call.Parameter("password").isNull() && !credentials.password.empty()) {
+        throw Failure(400, "password must be given again for an address of another host");
+    }
+    return credentials.account.empty() && credentials.password.empty() ? std::nullopt : std::optional(credentials);
+}
+
+void TakeCameraFields(const Call& call, admin::CameraSetup& setup) {
+    const admin::CameraSetup before = setup;
+    store::Camera& camera = setup.camera;
+    TakeField(call, "name", camera.name);
+    TakeField(call, "enabled", camera.enabled);
+    TakeField(call, "insecure", camera.insecure);
+    TakeField(call, "audio", camera.audio);
+    TakeField(call, "ptz", camera.ptz);
+    TakeField(call, "liveProfile", camera.live_profile);
+    TakeSources(call.Parameter("source"), camera);
+    if (LiveAddress(camera) != LiveAddress(before.camera)) {
+        // Until the recorder has seen it, unless the caller has.
+        camera.video_type = LiveAddress(camera).starts_with("http") ? base::Codec::kMjpeg : base::Codec::kH264;
+    }
+    TakeNamed(call.Parameter("codec"), "codec", kCodecs, camera.video_type);
+    std::vector<std::string> addresses;
+    for (const CameraProfile& profile : camera.profiles) {
+        addresses.push_back(profile.source);
+    }
+    setup.credentials = TakeCredentials(call, before, addresses);
+    TakeGroups(call.Parameter("group"), setup.groups);
+    TakePlan(call.Parameter("plan"), setup.plan);
+}
+
+}  // namespace lookhaven::api

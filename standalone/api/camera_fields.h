@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The fields of a camera's record, out of the parameters of a call.
+#pragma once
+
+#include <string>
+
+#include "standalone/admin/cameras.h"
+#include "standalone/api/call.h"
+#include "standalone/camera/isolated_source.h"
+
+namespace lookhaven::api {
+
+// Each leaves target as it is where the parameter is missing. Throws Failure 400, which names it, for another type.
+void TakeField(const Call& call, const char* name, bool& target);
+void TakeField(const Call& call, const char* name, int& target);
+void TakeField(const Call& call, const char* name, std::string& target);
+
+// Changes in the setup what the call names. A stored password goes to no other host than those that the camera has had:
+// whoever may replace it may not read it. Throws Failure 400.
+void TakeCameraFields(const Call& call, admin::CameraSetup& setup);
+
+// The account and password of the call for that address; those stored where it names none. Throws Failure 400 as above.
+std::optional<store::Credentials> TakeCredentials(const Call& call, const admin::CameraSetup& stored,
+                                                  const std::vector<std::string>& addresses);
+
+}  // namespace lookhaven::api

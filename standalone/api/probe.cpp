@@ -1,0 +1,93 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/probe.h"
+
+#include <algorithm>
+#include <cctype>
+
+#include <sodium.h>
+
+#include "standalone/admin/camera_stream.h"
+#include "standalone/api/camera_fields.h"
+#include "standalone/api/still_picture.h"
+#include "standalone/camera/isolated_source.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::size_t kMaxProbes = 3;
+constexpr int kPictureWidth = 640;
+// Of each step: to connect, to the first picture, to the next. Well within the host's limit of a request.
+constexpr std::chrono::seconds kMaxWait{6};
+
+std::string Base64(const std::vector<std::uint8_t>& bytes) {
+    std::string text(sodium_base64_ENCODED_LEN(bytes.size(), sodium_base64_VARIANT_ORIGINAL), '\0');
+    sodium_bin2base64(text.data(), text.size(), bytes.data(), bytes.size(), sodium_base64_VARIANT_ORIGINAL);
+    text.pop_back();  // the zero behind it
+    return text;
+}
+
+media::ProbeResult ProbeIsolated(const std::string& source, media::SourceOptions options) {
+    options.no_data_limit = kMaxWait;
+    return media::Probe(*camera::OpenIsolated(source, options, {}));
+}
+
+std::string LowerCase(std::string text) {
+    std::ranges::transform(text, text.begin(), [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+    return text;
+}
+
+// Empty where it cannot be decoded: the codec and the size are known all the same.
+std::string PictureOf(const Call& call, media::ProbeResult& found) {
+    try {
+        return found.key_frame.empty()
+                   ? ""
+                   : Base64(SmallJpeg(call, base::CodecName(found.video.codec), std::move(found.key_frame),
+                                      found.video.width, kPictureWidth));
+    } catch (const Failure&) {
+        return "";
+    }
+}
+
+Json::Value Describe(const Call& call, media::ProbeResult found) {
+    Json::Value data;
+    data["codec"] = LowerCase(base::CodecName(found.video.codec));
+    data["width"] = found.video.width;
+    data["height"] = found.video.height;
+    data["rate"] = found.frames_per_second;
+    data["audio"] = found.audio.has_value();
+    data["picture"] = PictureOf(call, found);
+    return data;
+}
+
+}  // namespace
+
+std::string ProbeCamera(const Call& call) {
+    std::string address;
+    bool is_insecure = false;
+    int id = 0;
+    TakeField(call, "address", address);
+    TakeField(call, "insecure", is_insecure);
+    TakeField(call, "camera", id);
+    admin::RequireManager(call.Records(), call.Actor());
+    const admin::CameraSetup stored = id == 0 ? admin::CameraSetup() : admin::ReadCamera(call.Records(), id);
+    const media::SourceKinds kinds = camera::NetworkKinds();
+    admin::RequireSource(kinds, address);
+    const std::optional<store::Credentials> credentials = TakeCredentials(call, stored, {address});
+    if (!call.slots.BeginProbing(call.slot, kMaxProbes)) {
+        throw Failure(429, "several cameras are being looked at already; try again in a moment",
+                      http::kRetrySoonSeconds);
+    }
+    call.context.CloseRecords();
+    try {
+        return SuccessAnswer(
+            Describe(call, admin::ProbeStream(ProbeIsolated, kinds, address, is_insecure, credentials)));
+    } catch (const media::SourceError& failure) {
+        Json::Value data;
+        data["failed"] = std::string(base::NameOf(failure.Cause()));
+        data["message"] = failure.what();
+        return SuccessAnswer(data);
+    }
+}
+
+}  // namespace lookhaven::api

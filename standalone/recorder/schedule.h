@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a plan that goes by the hour of the week means at a moment.
+#pragma once
+
+#include <cstdint>
+
+#include "standalone/recorder/catalog.h"
+
+namespace lookhaven::recorder {
+
+// The plan as one that is recorded always or never. Footage from before marks is kept ready only where a mark that
+// comes may have it.
+CameraPlan PlanAt(const CameraPlan& plan, std::int64_t now_s);
+
+// Whether the plan has footage of a mark of that moment recorded.
+bool TakesMarkAt(const CameraPlan& plan, std::int64_t moment_s);
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,195 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Changes of cameras: checked and stored as a whole, never over somebody else's, and told without a password.
+#include "standalone/admin/cameras.h"
+
+#include <thread>
+
+#include "standalone/admin/change.h"
+#include "standalone/store/audit_log.h"
+#include "standalone/store/events.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/users.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::admin {
+namespace {
+
+using store::Engine;
+using store::EngineName;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+std::unique_ptr<media::Source> Open(const std::string&, const media::SourceOptions&, std::stop_token) {
+    return nullptr;
+}
+
+class CameraChangeTest : public store::StoreTest {
+  protected:
+    static CameraSetup Gate() {
+        CameraSetup setup;
+        setup.camera = {.name = "Gate", .profiles = {{.source = "rtsp://192.0.2.1/a"}}};
+        setup.credentials = {"root", "camera-s3cret"};
+        return setup;
+    }
+
+    int AddGate() { return AddCamera(store_, {}, kinds_, Gate()).camera.id; }
+
+    void Set(int id, const CameraEdit& edit, std::optional<std::int64_t> seen = {}) {
+        SetCamera(store_, {}, kinds_, id, seen, edit);
+    }
+
+    store::AuditEntry LastChange() { return store::AuditLog(store_).List(0, 1).at(0); }
+
+    int AddEvent(int camera, bool recording, bool archived) {
+        store::Events events(store_);
+        store::Event event;
+        event.id = events.NextId();
+        event.camera_id = camera, event.mount_id = 1, event.recording = recording, event.archived = archived;
+        events.Begin(event);
+        return event.id;
+    }
+
+    const media::SourceKinds kinds_ = {{"http://", Open}, {"rtsp://", Open}};
+};
+
+TEST_P(CameraChangeTest, AnAddressIsOfAKnownKindAndHoldsNoSecret) {
+    for (const char* good : {"rtsp://192.0.2.1/a?b=c", "http://[2001:db8::1]:8080/", "rtsp://camera"}) {
+        RequireSource(kinds_, good);
+    }
+    for (const char* bad : {"", "file:/etc/passwd", "test:mjpeg", "concat:a|b", "rtsp://", "rtsp:///a",
+                            "rtsp://u:p@host/a", "rtsp://host:99999/", "http://a b/", "rtsp://host\\a"}) {
+        EXPECT_THROW(RequireSource(kinds_, bad), store::InvalidRecord) << bad;
+    }
+}
+
+TEST_P(CameraChangeTest, WhatCannotBeStoredAsAWholeIsNotStoredAtAll) {
+    const struct {
+        const char* what;
+        CameraEdit spoil;
+    } rows[] = {
+        {"no such group", [](CameraSetup& setup) { setup.groups = {7}; }},
+        {"no such mount", [](CameraSetup& setup) { setup.plan = store::RecordingPlan{.mount_id = 7}; }},
+        {"a wrong plan", [](CameraSetup& setup) { setup.plan = store::RecordingPlan{.hours = "012"}; }},
+        {"a wrong password",
+         [](CameraSetup& setup) {
+             setup.credentials = {"a", "\n"};
+         }},
+        {"an address of the command line", [](CameraSetup& setup) { setup.camera.profiles[0].source = "file:/a"; }},
+        {"no live profile", [](CameraSetup& setup) { setup.camera.live_profile = 2; }},
+        {"a stream that fails", [](CameraSetup&) { throw media::SourceError("refused"); }},
+    };
+    const int id = AddGate();
+    for (const auto& row : rows) {
+        EXPECT_ANY_THROW(Set(id, [&](CameraSetup& setup) { setup.camera.name = "Yard", row.spoil(setup); }))
+            << row.what;
+        CameraSetup another = Gate();
+        EXPECT_ANY_THROW({
+            row.spoil(another);
+            AddCamera(store_, {}, kinds_, another);
+        }) << row.what;
+    }
+    EXPECT_EQ(store::Cameras(store_).List().size(), 1);
+    EXPECT_EQ(ReadCamera(store_, id).camera.name, "Gate");
+    EXPECT_EQ(LastChange().id, 1) << "the log tells of nothing that did not happen";
+}
+
+TEST_P(CameraChangeTest, ASourceThatIsThereAlreadyStaysWhateverItsKind) {
+    const int file = store::Cameras(store_).Add({.name = "Clip", .profiles = {{.source = "file:/clip.mkv"}}});
+    Set(file, [](CameraSetup& setup) { setup.camera.name = "Film"; });
+    EXPECT_EQ(ReadCamera(store_, file).camera.name, "Film");
+}
+
+TEST_P(CameraChangeTest, SomebodyElsesChangeIsNotOverwritten) {
+    const int id = AddGate();
+    const auto seen = ToJson(ReadCamera(store_, id))["revision"].asInt64();
+    store::Cameras(store_).SetVideoType(id, base::Codec::kH265);  // which the recorder does by itself
+    Set(
+        id, [](CameraSetup& setup) { setup.camera.name = "Yard"; }, seen);
+    const auto rename = [](CameraSetup& setup) { setup.camera.name = "Shed"; };
+    const auto is_stale = [this, id](const std::function<void()>& change) {
+        try {
+            change();
+        } catch (const Stale& stale) {
+            return stale.Record() == ToJson(ReadCamera(store_, id));
+        }
+        return false;
+    };
+    EXPECT_TRUE(is_stale([&] { Set(id, rename, seen); }));
+    EXPECT_TRUE(is_stale([&] { RemoveCamera(store_, {}, id, seen, Footage::kKeep); }));
+    EXPECT_TRUE(is_stale([&] {
+        Set(id, [&](CameraSetup& setup) {
+            Set(id, [](CameraSetup& other) { other.camera.ptz = true; });  // while this one looks at the stream
+            rename(setup);
+        });
+    }));
+    EXPECT_EQ(ReadCamera(store_, id).camera.name, "Yard");
+}
+
+TEST_P(CameraChangeTest, TheLogTellsWhatChangedButNoPassword) {
+    const int group = store::Groups(store_).Add({.name = "Yard", .camera_ids = {}});
+    const int id = AddGate();
+    EXPECT_EQ(LastChange().object, "Gate (1)");
+    Set(id, [group](CameraSetup& setup) {
+        setup.credentials->password = "other-s3cret";
+        setup.groups = {group};
+    });
+    EXPECT_THAT(LastChange().after, testing::AllOf(HasSubstr(R"("group":[1])"), HasSubstr(R"("password":"changed")")));
+    EXPECT_EQ(store::Cameras(store_).FindCredentials(id)->password, "other-s3cret");
+    Set(id, [](CameraSetup& setup) { setup.groups.clear(), setup.credentials.reset(); });
+    EXPECT_TRUE(store::Groups(store_).Find(group)->camera_ids.empty());
+    OrderCameras(store_, {}, {AddGate(), id});
+    EXPECT_EQ(LastChange().after, "[2,1]");
+    EXPECT_EQ(store::Cameras(store_).List().front().id, 2);
+    EXPECT_THROW(OrderCameras(store_, {}, {2}), store::InvalidRecord);
+    for (const store::AuditEntry& entry : store::AuditLog(store_).List(0, 9)) {
+        EXPECT_THAT(entry.before + entry.after, Not(HasSubstr("s3cret"))) << entry.action;
+    }
+}
+
+TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
+    const int kept = AddGate();
+    const int removed = AddGate();
+    const int other = AddEvent(kept, false, false);
+    AddEvent(removed, false, false);
+    const int archived = AddEvent(removed, false, true);
+    const int growing = AddEvent(removed, true, false);
+    RemoveCamera(store_, {}, kept, std::nullopt, Footage::kKeep);
+    {
+        const std::jthread recorder([this, growing] {
+            store::Store store = store::Store::Open(url_);
+            while (store::Cameras(store).List().size() > 0) {
+                std::this_thread::yield();
+            }
+            store::Events(store).Finish(growing, 1, 1, 1);
+        });
+        RemoveCamera(store_, {}, removed, std::nullopt, Footage::kRemove);
+    }
+    store::Events events(store_);
+    EXPECT_TRUE(events.Find(other) && events.Find(archived));
+    EXPECT_FALSE(events.Find(growing)) << "what was being recorded goes, too";
+    EXPECT_EQ(events.PendingDeletion(1).size(), 2);
+    EXPECT_EQ(events.FootageOfCameras().at(removed).events, 1);
+}
+
+TEST_P(CameraChangeTest, IsForManagersHereToo) {
+    const Actor viewer{store::Users(store_).Add("eve", "correct horse", store::Privilege::kViewer).id, "eve",
+                       "192.0.2.7"};
+    const int id = AddGate();
+    const std::function<void()> changes[] = {
+        [&] { AddCamera(store_, viewer, kinds_, Gate()); },
+        [&] { SetCamera(store_, viewer, kinds_, id, {}, [](CameraSetup&) { FAIL() << "nothing is looked at"; }); },
+        [&] { RemoveCamera(store_, viewer, id, {}, Footage::kRemove); },
+        [&] { OrderCameras(store_, viewer, {id}); },
+    };
+    for (const auto& change : changes) {
+        EXPECT_THROW(change(), Forbidden);
+    }
+    EXPECT_EQ(LastChange().id, 1);
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(CameraChangeTest);
+
+}  // namespace
+}  // namespace lookhaven::admin
