@@ -99,6 +99,8 @@ void Supervisor::Reconcile() {
     for (const control::LiveStream& stream : needed) {
         if (const auto plan = catalog->streams.find(stream); plan != catalog->streams.end()) {
             plans.insert(*plan);
+        } else {
+            catalog_.Refresh();  // added a moment ago, perhaps
         }
     }
     some_are_ending_ = false;

@@ -18,9 +18,9 @@ class CameraSetupTest(unittest.TestCase):
     def setUpClass(cls):
         cls.server = cls.enterClassContext(Installation())
 
-    def ask(self, method, api="VEXO.Camera", account="admin", **parameters):
+    def ask(self, method, api="VEXO.Camera", **parameters):
         connection, response = self.server.open(
-            call(api, method), account, body=json.dumps(parameters), headers={"Content-Type": "application/json"}
+            call(api, method), "admin", body=json.dumps(parameters), headers={"Content-Type": "application/json"}
         )
         answer = json.loads(response.read())
         connection.close()

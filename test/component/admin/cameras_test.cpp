@@ -34,7 +34,7 @@ class CameraChangeTest : public store::StoreTest {
         return setup;
     }
 
-    int AddGate() { return AddCamera(store_, {}, kinds_, Gate()).camera.id; }
+    int AddGate() { return admin::AddCamera(store_, {}, kinds_, Gate()).camera.id; }
 
     void Set(int id, const CameraEdit& edit, std::optional<std::int64_t> seen = {}) {
         SetCamera(store_, {}, kinds_, id, seen, edit);
@@ -87,7 +87,7 @@ TEST_P(CameraChangeTest, WhatCannotBeStoredAsAWholeIsNotStoredAtAll) {
         CameraSetup another = Gate();
         EXPECT_ANY_THROW({
             row.spoil(another);
-            AddCamera(store_, {}, kinds_, another);
+            admin::AddCamera(store_, {}, kinds_, another);
         }) << row.what;
     }
     EXPECT_EQ(store::Cameras(store_).List().size(), 1);
@@ -178,7 +178,7 @@ TEST_P(CameraChangeTest, IsForManagersHereToo) {
                        "192.0.2.7"};
     const int id = AddGate();
     const std::function<void()> changes[] = {
-        [&] { AddCamera(store_, viewer, kinds_, Gate()); },
+        [&] { admin::AddCamera(store_, viewer, kinds_, Gate()); },
         [&] { SetCamera(store_, viewer, kinds_, id, {}, [](CameraSetup&) { FAIL() << "nothing is looked at"; }); },
         [&] { RemoveCamera(store_, viewer, id, {}, Footage::kRemove); },
         [&] { OrderCameras(store_, viewer, {id}); },
