@@ -49,6 +49,12 @@ class Stale : public std::runtime_error {
     Json::Value record_;
 };
 
+// What was to go, or to be otherwise, is needed as it is, as the text says; nothing was changed.
+class StillNeeded : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
 // record: with its member "revision". Throws Stale where a revision was seen and that is another. Call it inside of
 // Apply.
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen);

@@ -42,6 +42,7 @@ extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it se
 extern const OwnApi kPlaybackApi;  // steers a running player of the caller's session
 extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
 extern const OwnApi kSystemApi;    // health and metrics, for those who watch over the installation
+extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own password
 
 // Null when there is no such API.
 const OwnApi* FindOwnApi(const std::string& name);

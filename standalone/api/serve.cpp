@@ -141,6 +141,8 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
         throw Failure(409, error.what());
     } catch (const admin::Stale& error) {
         throw Failure(409, error.what(), 0, admin::ToText(error.Record()));
+    } catch (const admin::StillNeeded& error) {
+        throw Failure(409, error.what());
     } catch (const admin::Forbidden& error) {
         throw Failure(403, error.what());
     }

@@ -90,6 +90,8 @@ int Run(int argc, char** argv) {
         return Report(console, error.Code(), error.what());
     } catch (const store::InvalidRecord& error) {
         return Report(console, kDataError, error.what());
+    } catch (const admin::StillNeeded& error) {
+        return Report(console, kDataError, error.what());
     } catch (const store::NotFound& error) {
         return Report(console, kNoInput, error.what());
     } catch (const admin::Stale& error) {

@@ -6,6 +6,7 @@
 #include <map>
 #include <optional>
 
+#include "standalone/admin/users.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
@@ -102,10 +103,18 @@ constexpr Column kColumns[] = {{"id", "id"},
                                {"denied groups", "denied_groups", DeniedAccessText},
                                {"other denied items", "", DeniedItemsText}};
 
+// As it is after a change.
+Json::Value DataOf(store::Store& store, const std::string& name) {
+    Users users(store);
+    return ToData(RequireUser(users, name));
+}
+
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const Json::Value user =
-        ToData(Users(store).Add(request.name, ReadPassword(request.name, true), request.privilege));
+    admin::AddUser(
+        store, {}, request.name,
+        {.password = store::HashedPassword(ReadPassword(request.name, true)), .privilege = request.privilege});
+    const Json::Value user = DataOf(store, request.name);
     console.Answer(user, "Added account ", request.name, " as ", PrivilegeName(user["privilege"]), ".");
 }
 
@@ -115,12 +124,13 @@ void List(const Console& console) {
     Json::Value data = Json::arrayValue;
     for (const User& user : users.List()) {
         Json::Value& entry = data.append(ToData(user));
+        store::Denials denials = users.FindDenials(user.id);
         for (const auto& [name, kind] : kAccess) {
             entry["denied"][name] = Ids(users.DeniedCameras(user.id, kind));
-            entry["denied_groups"][name] = Ids(users.DeniedGroups(user.id, kind));
+            entry["denied_groups"][name] = Ids(denials.groups[kind]);
         }
         for (const ItemKind& kind : kItems) {
-            entry[kind.key] = Ids(users.DeniedItems(user.id, kind.kind));
+            entry[kind.key] = Ids(denials.items[kind.kind]);
         }
     }
     console.Answer(data, Table(kColumns, data));
@@ -130,7 +140,7 @@ void SetPassword(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Users users(store);
     const User user = RequireUser(users, request.name);
-    users.SetPassword(user.id, ReadPassword(user.name, true));
+    admin::SetUser(store, {}, user.id, {}, {.password = store::HashedPassword(ReadPassword(user.name, true))});
     console.Answer(ToData(user), "Account ", user.name, " has a new password and is logged out everywhere.");
 }
 
@@ -138,20 +148,8 @@ void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Users users(store);
     const User user = RequireUser(users, request.name);
-    const std::vector<User> all = users.List();
-    if (user.privilege == Privilege::kOwner && std::ranges::count(all, Privilege::kOwner, &User::privilege) == 1) {
-        throw Failure(kDataError, user.name, " is the only owner: add another one first");
-    }
-    users.Remove(user.id);
+    admin::RemoveUser(store, {}, user.id, {});
     console.Answer(ToData(user), "Removed account ", user.name, ".");
-}
-
-void PermitKind(Users& users, int user, const Request& request, bool allow, CameraAccess kind) {
-    if (request.group) {
-        allow ? users.AllowGroup(user, *request.group, {kind}) : users.DenyGroup(user, *request.group, {kind});
-    } else {
-        allow ? users.Allow(user, *request.camera, {kind}) : users.Deny(user, *request.camera, {kind});
-    }
 }
 
 void RequireCamera(store::Store& store, int id) {
@@ -160,18 +158,24 @@ void RequireCamera(store::Store& store, int id) {
     }
 }
 
-// Of a camera or group; returns the end of the answer.
-std::string PermitAccess(store::Store& store, int user, const Request& request, bool allow) {
-    if (!allow && request.camera) {
-        RequireCamera(store, *request.camera);
+void Permit(std::set<int>& denied, int id, bool allow) {
+    if (allow) {
+        denied.erase(id);
+    } else {
+        denied.insert(id);
     }
-    Users users(store);
-    bool still_denied = false;
-    for (const CameraAccess kind : request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds) {
-        PermitKind(users, user, request, allow, kind);
-        still_denied =
-            still_denied || (allow && request.camera && users.DeniedCameras(user, kind).contains(*request.camera));
-    }
+}
+
+std::vector<CameraAccess> KindsOf(const Request& request) {
+    return request.kinds.empty() ? std::vector(store::kEveryAccess) : request.kinds;
+}
+
+// The end of the answer.
+std::string EndOfAllowance(Users& users, int user, const Request& request) {
+    const std::vector<CameraAccess> kinds = KindsOf(request);
+    const bool still_denied = request.camera && std::ranges::any_of(kinds, [&](CameraAccess kind) {
+                                  return users.DeniedCameras(user, kind).contains(*request.camera);
+                              });
     return still_denied ? ", but belongs to a group that is denied." : ".";
 }
 
@@ -180,14 +184,6 @@ const ItemKind* NamedItem(const Request& request) {
     const auto* kind =
         std::ranges::find_if(kItems, [&](const ItemKind& each) { return request.items.at(each.kind).has_value(); });
     return kind == std::end(kItems) ? nullptr : kind;
-}
-
-void PermitMarks(Users& users, const User& user, bool allow) {
-    if (!allow && user.IsManager()) {
-        throw Failure(kDataError, user.name, " is ", PrivilegeName(static_cast<int>(user.privilege)),
-                      ", and may report alerts and POS transactions as such");
-    }
-    allow ? users.AllowMarks(user.id) : users.DenyMarks(user.id);
 }
 
 void Permit(const Console& console, const Request& request, bool allow) {
@@ -204,21 +200,30 @@ void Permit(const Console& console, const Request& request, bool allow) {
     store::Store store = console.OpenStore();
     Users users(store);
     const User user = RequireUser(users, request.name);
-    std::string subject = request.camera ? Concat("camera ", *request.camera) : "";
-    std::string end = ".";
+    std::string subject;
+    admin::UserChange change;
     if (request.marks) {
         subject = "reporting of alerts and POS transactions";
-        PermitMarks(users, user, allow);
+        change.may_mark = allow;
     } else if (item != nullptr) {
         const int id = *request.items.at(item->kind);
         subject = Concat(item->name, " ", id);
-        allow ? users.AllowItem(user.id, item->kind, id) : users.DenyItem(user.id, item->kind, id);
+        change.denials = [item, id, allow](store::Denials& denials) { Permit(denials.items[item->kind], id, allow); };
     } else {
-        subject = request.group ? Concat("group ", *request.group) : subject;
-        end = PermitAccess(store, user.id, request, allow);
+        const int id = request.group ? *request.group : *request.camera;
+        subject = Concat(request.group ? "group " : "camera ", id);
+        if (!allow && request.camera) {
+            RequireCamera(store, id);
+        }
+        change.denials = [&request, id, allow](store::Denials& denials) {
+            for (const CameraAccess kind : KindsOf(request)) {
+                Permit((request.group ? denials.groups : denials.cameras)[kind], id, allow);
+            }
+        };
     }
-    console.Answer(ToData(RequireUser(users, user.name)), "The ", subject, allow ? " is allowed to " : " is denied to ",
-                   user.name, end);
+    admin::SetUser(store, {}, user.id, {}, change);
+    console.Answer(DataOf(store, user.name), "The ", subject, allow ? " is allowed to " : " is denied to ", user.name,
+                   allow ? EndOfAllowance(users, user.id, request) : ".");
 }
 
 void Deny(const Console& console, const Request& request) {

@@ -186,6 +186,10 @@ constexpr const char* kSchedules[] = {
     "alter table recording_plans add column hours text not null default ''",
 };
 
+constexpr const char* kSessionAddresses[] = {
+    "alter table sessions add column address text not null default ''",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -200,6 +204,7 @@ constexpr Migration kMigrations[] = {
     {"the audit log", kAuditLog},
     {"the order of cameras", kCameraOrder},
     {"recording by the hour of the week", kSchedules},
+    {"where a log-in came from", kSessionAddresses},
 };
 
 }  // namespace

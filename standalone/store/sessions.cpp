@@ -13,10 +13,11 @@ namespace lookhaven::store {
 template <>
 struct Mapping<Session> {
     static constexpr const char* kTable = "sessions join users on users.id = user_id";
-    static constexpr const char* kColumns = "handle, created, last_seen, expires, users.id, name, privilege, may_mark";
+    static constexpr const char* kColumns =
+        "handle, created, last_seen, expires, address, users.id, name, privilege, may_mark";
     static auto Members(auto& session) {
-        return std::tie(session.handle, session.created_s, session.last_seen_s, session.expires_s, session.user.id,
-                        session.user.name, session.user.privilege, session.user.may_mark_as_viewer);
+        return std::tie(session.handle, session.created_s, session.last_seen_s, session.expires_s, session.address,
+                        session.user.id, session.user.name, session.user.privilege, session.user.may_mark_as_viewer);
     }
 };
 
@@ -38,25 +39,26 @@ std::string NewSecret(std::string_view key) {
 
 }  // namespace
 
-NewSession Sessions::Create(int user_id, std::int64_t now_s) {
-    return Insert(user_id, nullptr, now_s);
+NewSession Sessions::Create(int user_id, std::int64_t now_s, std::string_view address) {
+    return Insert(user_id, nullptr, now_s, address);
 }
 
-NewSession Sessions::Create(const VerifiedUser& user, std::int64_t now_s) {
-    return Insert(user.id, &user.password_hash, now_s);
+NewSession Sessions::Create(const VerifiedUser& user, std::int64_t now_s, std::string_view address) {
+    return Insert(user.id, &user.password_hash, now_s, address);
 }
 
-NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::int64_t now_s) {
+NewSession Sessions::Insert(int user_id, const std::string* password_hash, std::int64_t now_s,
+                            std::string_view address) {
     const NewSession session{NewSecret(Key()), RandomHex(kHandleBytes)};
     const bool any_password = password_hash == nullptr;
     connection_.Write([&](soci::session& sql) {
         const auto found =
             FetchOne<int>(sql,
-                          "insert into sessions (secret_hash, handle, user_id, created, last_seen, expires)"
-                          " select :hash, :handle, id, :created, :seen, :expires from users where id = :user"
+                          "insert into sessions (secret_hash, handle, user_id, created, last_seen, expires, address)"
+                          " select :hash, :handle, id, :created, :seen, :expires, :address from users where id = :user"
                           " and (password_hash = :verified or :any = 1) returning user_id",
-                          Digest(session.secret), session.handle, now_s, now_s, EndOf(lifetime_, now_s, now_s), user_id,
-                          any_password ? std::string() : *password_hash, any_password);
+                          Digest(session.secret), session.handle, now_s, now_s, EndOf(lifetime_, now_s, now_s),
+                          std::string(address), user_id, any_password ? std::string() : *password_hash, any_password);
         Require(found, "account", user_id);
         Execute(sql,
                 "delete from sessions where user_id = :user and handle <> :new and (expires <= :now or handle not in"
@@ -102,8 +104,33 @@ bool Sessions::End(std::string_view handle) {
            connection_.Execute("delete from sessions where handle = :handle", std::string(handle)) > 0;
 }
 
-int Sessions::EndOfUser(int user_id) {
-    return connection_.Execute("delete from sessions where user_id = :user", user_id);
+bool Sessions::End(int user_id, std::string_view handle) {
+    return base::IsHex(handle, 2 * kHandleBytes) &&
+           connection_.Execute("delete from sessions where user_id = :user and handle = :handle", user_id,
+                               std::string(handle)) > 0;
+}
+
+int Sessions::EndOfUser(int user_id, std::string_view kept) {
+    return connection_.Execute("delete from sessions where user_id = :user and handle <> :kept", user_id,
+                               std::string(kept));
+}
+
+std::vector<Session> Sessions::OfUser(int user_id, std::int64_t now_s) {
+    return connection_.FetchAll<Session>("where user_id = :user and expires > :now order by created desc, handle",
+                                         user_id, now_s);
+}
+
+std::map<int, Sessions::Use> Sessions::Uses(std::int64_t now_s) {
+    std::map<int, Use> uses;
+    connection_.Read([&](soci::session& sql) {
+        Query<std::tuple<int, int, std::int64_t>>(
+            sql, kOnce, "select user_id, count(*), max(last_seen) from sessions where expires > :now group by user_id",
+            now_s)
+            .ForEach([&uses](const auto& row) {
+                uses[std::get<0>(row)] = {std::get<1>(row), std::get<2>(row)};
+            });
+    });
+    return uses;
 }
 
 std::vector<std::string> Sessions::EndedAmong(const std::vector<std::string>& handles, std::int64_t now_s) {

@@ -9,6 +9,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -36,6 +37,7 @@ struct Session {
     std::int64_t created_s = 0;
     std::int64_t last_seen_s = 0;  // to the minute
     std::int64_t expires_s = 0;
+    std::string address;  // where the log-in came from; empty where that is not known
 };
 
 class Sessions {
@@ -50,10 +52,10 @@ class Sessions {
     static constexpr std::size_t kKeyDigits = 64;
 
     // Throws NotFound for an unknown user.
-    NewSession Create(int user_id, std::int64_t now_s);
+    NewSession Create(int user_id, std::int64_t now_s, std::string_view address = {});
     // The same at a log-in. Throws NotFound too when the password has changed since it was checked, for that change
     // could not end a session that did not exist yet.
-    NewSession Create(const VerifiedUser& user, std::int64_t now_s);
+    NewSession Create(const VerifiedUser& user, std::int64_t now_s, std::string_view address = {});
 
     // False for what cannot be a session's secret, without asking the store. With the key, of Key(), only what the
     // store has once given out can be one.
@@ -68,8 +70,18 @@ class Sessions {
 
     // False when there was no such session.
     bool End(std::string_view handle);
-    // The number of sessions ended.
-    int EndOfUser(int user_id);
+    // Only if it is the user's; false when the user has no such session.
+    bool End(int user_id, std::string_view handle);
+    // The number of sessions ended; that of the handle stays.
+    int EndOfUser(int user_id, std::string_view kept = {});
+
+    // The user's live ones, the newest first.
+    std::vector<Session> OfUser(int user_id, std::int64_t now_s);
+    struct Use {
+        int sessions = 0;  // live ones
+        std::int64_t last_s = 0;
+    };
+    std::map<int, Use> Uses(std::int64_t now_s);  // by user
 
     // Those of the handles whose session is over: unknown, expired or ended. One query.
     std::vector<std::string> EndedAmong(const std::vector<std::string>& handles, std::int64_t now_s);
@@ -82,7 +94,7 @@ class Sessions {
 
   private:
     // password_hash: null when it does not matter.
-    NewSession Insert(int user_id, const std::string* password_hash, std::int64_t now_s);
+    NewSession Insert(int user_id, const std::string* password_hash, std::int64_t now_s, std::string_view address);
 
     Connection& connection_;
     SessionLifetime lifetime_;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/users.h"
 
+#include <algorithm>
+
 #include "standalone/store/connection.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/text.h"
@@ -88,6 +90,60 @@ void AllowRows(soci::session& sql, const DenialTable& table, int user, int subje
     }
 }
 
+// The rows of a denial table that are the user's, by kind.
+template <typename Kind>
+std::map<Kind, std::set<int>> FetchDenials(soci::session& sql, const std::string& columns, const std::string& table,
+                                           int user) {
+    std::map<Kind, std::set<int>> denied;
+    Query<std::pair<Kind, int>>(sql, kOnce, "select " + columns + " from " + table + " where user_id = :user", user)
+        .ForEach([&denied](const auto& row) { denied[row.first].insert(row.second); });
+    return denied;
+}
+
+Denials FetchDenials(soci::session& sql, int user) {
+    return {FetchDenials<CameraAccess>(sql, "access, camera_id", "denied_cameras", user),
+            FetchDenials<CameraAccess>(sql, "access, group_id", "denied_groups", user),
+            FetchDenials<DeniableItem>(sql, "kind, item_id", "denied_items", user)};
+}
+
+// The ids under each kind of one that the other lacks.
+template <typename Kind>
+std::map<Kind, std::set<int>> Without(const std::map<Kind, std::set<int>>& one,
+                                      const std::map<Kind, std::set<int>>& other) {
+    std::map<Kind, std::set<int>> left;
+    for (const auto& [kind, ids] : one) {
+        const auto found = other.find(kind);
+        for (const int id : ids) {
+            if (found == other.end() || !found->second.contains(id)) {
+                left[kind].insert(id);
+            }
+        }
+    }
+    return left;
+}
+
+// True when something is denied that was not.
+template <typename Kind>
+bool ReplaceRows(soci::session& sql, const DenialTable& table, int user, const std::map<Kind, std::set<int>>& before,
+                 const std::map<Kind, std::set<int>>& after) {
+    const auto change = [&](const std::string& text, const std::map<Kind, std::set<int>>& rows) {
+        for (const auto& [kind, ids] : rows) {
+            for (const int id : ids) {
+                Execute(sql, text + kDenial, user, id, kind);
+            }
+        }
+    };
+    const std::string which = std::string(table.name) + " ";
+    const auto added = Without(after, before);
+    change("delete from " + which + "where " + table.columns + " = ", Without(before, after));
+    change("insert into " + which + table.columns + " values ", added);
+    return !added.empty();
+}
+
+void RequireGroup(soci::session& sql, int id) {
+    Require(FetchOne<int>(sql, "select id from camera_groups where id = :id", id), "camera group", id);
+}
+
 template <typename Account>
 std::optional<Account> FetchByName(Connection& connection, std::string_view name) {
     return IsAccountName(name) ? connection.FetchOne<Account>("where lower(name) = lower(:name)", std::string(name))
@@ -96,13 +152,20 @@ std::optional<Account> FetchByName(Connection& connection, std::string_view name
 
 }  // namespace
 
+HashedPassword::HashedPassword(std::string_view password)
+    : text_((RequirePassword(password), HashPassword(password))) {}
+
 User Users::Add(std::string_view name, std::string_view password, Privilege privilege) {
     RequireName(name);
-    RequirePassword(password);
+    return Add(name, HashedPassword(password), privilege);
+}
+
+User Users::Add(std::string_view name, const HashedPassword& password, Privilege privilege) {
+    RequireName(name);
     VerifiedUser user;
     user.name = name;
     user.privilege = privilege;
-    user.password_hash = HashPassword(password);
+    user.password_hash = password.Text();
     return connection_.Write([&](soci::session& sql) -> User {
         user.id = NextId(sql, "user");
         if (Exists(sql, "select id from users where lower(name) = lower(:name)", user.name)) {
@@ -131,13 +194,58 @@ std::vector<User> Users::List() {
     return connection_.FetchAll<User>("order by id");
 }
 
+void Users::Lock() {
+    connection_.Execute("update counters set value = value where name = 'user'");
+}
+
 void Users::SetPassword(int id, std::string_view password) {
-    RequirePassword(password);
-    const std::string hash = HashPassword(password);
+    SetPassword(id, HashedPassword(password));
+}
+
+void Users::SetPassword(int id, const HashedPassword& password) {
     connection_.Write([&](soci::session& sql) {
         RequireUser(sql, id);
-        Execute(sql, "update users set password_hash = :hash where id = :id", hash, id);
+        Execute(sql, "update users set password_hash = :hash where id = :id", password.Text(), id);
         EndSessions(sql, id);
+    });
+}
+
+void Users::SetPassword(const VerifiedUser& user, const HashedPassword& password, std::string_view kept_session) {
+    connection_.Write([&](soci::session& sql) {
+        const int changed =
+            Execute(sql, "update users set password_hash = :hash where id = :id and password_hash = :verified",
+                    password.Text(), user.id, user.password_hash);
+        Require(changed > 0 ? std::optional(user.id) : std::nullopt, "account", user.id);
+        Execute(sql, "delete from sessions where user_id = :user and handle <> :kept", user.id,
+                std::string(kept_session));
+    });
+}
+
+void Users::SetPrivilege(int id, Privilege privilege) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        if (Execute(sql, "update users set privilege = :privilege where id = :id and privilege < :lower", privilege, id,
+                    privilege) > 0) {
+            EndSessions(sql, id);
+        } else {
+            Execute(sql, "update users set privilege = :privilege where id = :id", privilege, id);
+        }
+    });
+}
+
+void Users::SetDenials(int id, const Denials& denials) {
+    connection_.Write([&](soci::session& sql) {
+        RequireUser(sql, id);
+        const Denials before = FetchDenials(sql, id);
+        for (const auto& [kind, groups] : Without(denials.groups, before.groups)) {
+            std::ranges::for_each(groups, [&](int group) { RequireGroup(sql, group); });
+        }
+        const bool cameras_added = ReplaceRows(sql, kDeniedCameras, id, before.cameras, denials.cameras);
+        const bool groups_added = ReplaceRows(sql, kDeniedGroups, id, before.groups, denials.groups);
+        const bool items_added = ReplaceRows(sql, kDeniedItems, id, before.items, denials.items);
+        if (cameras_added || groups_added || items_added) {
+            EndSessions(sql, id);
+        }
     });
 }
 
@@ -151,7 +259,7 @@ void Users::Allow(int id, int camera_id, std::initializer_list<CameraAccess> kin
 
 void Users::DenyGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds) {
     connection_.Write([&](soci::session& sql) {
-        Require(FetchOne<int>(sql, "select id from camera_groups where id = :id", group_id), "camera group", group_id);
+        RequireGroup(sql, group_id);
         DenyRows(sql, kDeniedGroups, id, group_id, kinds);
     });
 }
@@ -210,6 +318,10 @@ std::set<int> Users::DeniedGroups(int id, CameraAccess kind) {
 std::set<int> Users::DeniedItems(int id, DeniableItem kind) {
     return connection_.FetchAll<int, std::set<int>>(
         "select item_id from denied_items where user_id = :user and kind = :kind", id, kind);
+}
+
+Denials Users::FindDenials(int id) {
+    return connection_.Read([id](soci::session& sql) { return FetchDenials(sql, id); });
 }
 
 }  // namespace lookhaven::store

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <initializer_list>
+#include <map>
 #include <optional>
 #include <set>
 #include <string>
@@ -38,12 +39,30 @@ struct User {
     bool MayMark() const { return IsManager() || may_mark_as_viewer; }
 };
 
+// What a user is denied, as a whole. A kind without ids may be missing.
+struct Denials {
+    std::map<CameraAccess, std::set<int>> cameras;  // by themselves, not as members of a group
+    std::map<CameraAccess, std::set<int>> groups;
+    std::map<DeniableItem, std::set<int>> items;
+};
+
+// A password as the store keeps it.
+class HashedPassword {
+  public:
+    // Takes a tenth of a second and 64 MiB. Throws InvalidRecord unless the password has 8 to 1,024 bytes.
+    explicit HashedPassword(std::string_view password);
+    const std::string& Text() const { return text_; }
+
+  private:
+    std::string text_;
+};
+
 // A user whose password was right, with the hash that said so: it is gone once the password changes.
 struct VerifiedUser : User {
     std::string password_hash;
 };
 
-// Invariants    (1) A change that takes a right away (password, denial, removal) ends the user's sessions with it.
+// Invariants    (1) A change that takes a right away (password, privilege, denial, removal) ends the user's sessions with it.
 //                   So does one of a group that is denied.
 //               (2) Names are compared without regard to case; no account is called "Lookhaven".
 class Users {
@@ -54,6 +73,7 @@ class Users {
     // name: 1 to 64 ASCII letters, digits, ".", "_", "-", "@", the first a letter or digit. password: 8 to 1,024 bytes.
     // Takes a tenth of a second and 64 MiB, as does every use of a password. Throws InvalidRecord or AlreadyExists.
     User Add(std::string_view name, std::string_view password, Privilege privilege);
+    User Add(std::string_view name, const HashedPassword& password, Privilege privilege);
 
     // The account when name and password are right. An unknown name costs as much as a wrong password. A lack of those
     // 64 MiB counts as a wrong one.
@@ -63,8 +83,17 @@ class Users {
     std::optional<User> FindByName(std::string_view name);
     std::vector<User> List();  // by id
 
+    // Inside of InTransaction: until its end, nobody else who calls this goes on.
+    void Lock();
+
     // These throw NotFound for an unknown id.
     void SetPassword(int id, std::string_view password);
+    void SetPassword(int id, const HashedPassword& password);
+    // The session of that handle stays. NotFound, too, when the password has changed since it was checked.
+    void SetPassword(const VerifiedUser& user, const HashedPassword& password, std::string_view kept_session);
+    void SetPrivilege(int id, Privilege privilege);
+    // Throws NotFound, too, for an unknown group. Cameras and items need not exist.
+    void SetDenials(int id, const Denials& denials);
     void Deny(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void Allow(int id, int camera_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
     void DenyGroup(int id, int group_id, std::initializer_list<CameraAccess> kinds = kEveryAccess);
@@ -82,6 +111,7 @@ class Users {
     std::set<int> DeniedCameras(int id, CameraAccess kind);
     std::set<int> DeniedGroups(int id, CameraAccess kind);
     std::set<int> DeniedItems(int id, DeniableItem kind);
+    Denials FindDenials(int id);
 
   private:
     Connection& connection_;

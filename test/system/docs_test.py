@@ -7,7 +7,7 @@ import re
 import time
 import unittest
 
-from installation import PASSWORDS, ROOT, Installation, Parts, recorded_events
+from installation import PASSWORDS, ROOT, Installation, Parts, call, recorded_events
 
 EXAMPLE = re.compile(
     r"(?:```player\n([^`]*)```\s*)?```request(?: as (\w+))?\n([^`]*)```\s*```answer (\d+)(?: (\S+))?\n([^`]*)```"
@@ -24,10 +24,13 @@ def shape(value):
 
 
 def words(server):
-    """What stands for the words with a dollar sign: an event of the demo, and the day around it."""
+    """What stands for the words with a dollar sign: an event of the demo, the day around it, and the account viewer."""
     now = int(time.time())
+    accounts = server.request(call("VEXO.User", "List"), "admin", {}).json["data"]["user"]
     return {
         "$ADMIN_PASSWORD": PASSWORDS["admin"].replace(" ", "+"),
+        "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),
+        "$REVISION": str(next(one["revision"] for one in accounts if one["name"] == "viewer")),
         "$EVENT": str(recorded_events(server, 1)[0]["id"]),
         "$FROM": str(now - 86400),
         "$TO": str(now),

@@ -58,6 +58,14 @@ Relay.Play server=2 camera={camera}                                   E      E  
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
 POST System.Audit                                                     E      E     F       F     F    F       F        F      D       E
+POST User.List                                                        E      E     F       F     F    F       F        F      D       E
+POST User.Add name=new password=long-enough reauth=own                E      E     F       F     F    F       F        F      D       E
+POST User.Set id={user} revision=1 mayMark=true                       E      E     F       F     F    F       F        F      C/N     E
+POST User.Remove id={user} revision=1 reauth=own                      E      E     F       F     F    F       F        F      C/N     E
+POST User.Sessions id={user}                                          E      E     F       F     F    F       F        F      D/N     E
+POST User.EndSessions id={user}                                       E      E     F       F     F    F       F        F      D/N     E
+POST User.Preview id={user}                                           E      E     F       F     F    F       F        F      D/N     E
+POST User.ChangePassword password=own newPassword=own                 E      E     D       D     D    D       D        D      D       E
 Player.LoadCamera: camera                                             E      E     D       O     D    D       D        D      D       E
 Player.SearchAvaiDate cameralists={camera} start=-1d day_count=2: day E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Player.EnumEvent cameralists={camera} from=-1d to=now: event          E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
@@ -131,12 +139,13 @@ class RightsTest(unittest.TestCase):
         server.cli("user", "passwd", "ended", text="another secret")
         marks = server.request(call("VEXO.Event", "List", cameralists=2, kind="alert"), "manager").json["data"]["event"]
         cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "event": recorded_events(server, 2)[0]["id"],
-                   "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"]}
+                   "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"],
+                   "user": next(one["id"] for one in json.loads(server.cli("user", "list", "--json")) if one["name"] == "ended")}
 
     def ask(self, is_post, request, told, caller, **objects):
         """The outcome's letter, and all of the answer that must not tell a hidden object from an absent one."""
         now = int(time.time())
-        words = {"-1d": now - 86400, "now": now, "now_ms": now * 1000}
+        words = {"-1d": now - 86400, "now": now, "now_ms": now * 1000, "own": PASSWORDS.get(caller, "none")}
         given = dict(word.format(**objects).split("=") for word in request.split()[1:])
         given = {name: words.get(value, value) for name, value in given.items()}
         api, method = api_and_method(request)

@@ -115,6 +115,10 @@ TEST_P(AccountTest, DenialsAreKeptPerKind) {
 TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
     const int id = users_.Add("bob", kPassword, Privilege::kViewer).id;
     const NewSession other = sessions_.Create(users_.Add("eve", kPassword, Privilege::kViewer).id, kNow);
+    Denials door;
+    door.items[DeniableItem::kDoor] = {3};
+    Denials sound;
+    sound.cameras[CameraAccess::kAudio] = {2};
     const struct {
         const char* change;
         std::function<void()> make;
@@ -125,6 +129,11 @@ TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
         {"deny item", [&] { users_.DenyItem(id, DeniableItem::kDoor, 3); }, true},
         {"allow marks", [&] { users_.AllowMarks(id); }, false},
         {"deny marks", [&] { users_.DenyMarks(id); }, true},
+        {"more privilege", [&] { users_.SetPrivilege(id, Privilege::kOwner); }, false},
+        {"less privilege", [&] { users_.SetPrivilege(id, Privilege::kManager); }, true},
+        {"the same denials", [&] { users_.SetDenials(id, users_.FindDenials(id)); }, false},
+        {"fewer denials", [&] { users_.SetDenials(id, door); }, false},
+        {"another denial", [&] { users_.SetDenials(id, sound); }, true},
         {"password", [&] { users_.SetPassword(id, "another one"); }, true},
         {"end of user", [&] { EXPECT_EQ(sessions_.EndOfUser(id), 1); }, true},
         {"removal", [&] { users_.Remove(id); }, true},
@@ -136,10 +145,14 @@ TEST_P(AccountTest, LosingARightEndsTheUsersSessionsAndNobodyElses) {
         EXPECT_EQ(sessions_.FindBySecret(session.secret, kNow).has_value(), !row.ends) << row.change;
         EXPECT_EQ(sessions_.EndedAmong({session.handle, other.handle}, kNow).size(), row.ends ? 1U : 0U) << row.change;
     }
+    EXPECT_FALSE(sessions_.End(id, other.handle)) << "somebody else's";
     EXPECT_TRUE(sessions_.FindBySecret(other.secret, kNow));
     const auto verified = users_.CheckPassword("eve", kPassword);
     EXPECT_TRUE(sessions_.FindBySecret(sessions_.Create(*verified, kNow).secret, kNow));
-    users_.SetPassword(verified->id, "another one");
+    users_.SetPassword(*verified, HashedPassword(kPassword), other.handle);
+    EXPECT_THAT(sessions_.OfUser(verified->id, kNow), testing::SizeIs(1)) << "the one in which it was changed";
+    EXPECT_TRUE(sessions_.FindBySecret(other.secret, kNow));
+    EXPECT_THROW(users_.SetPassword(*verified, HashedPassword(kPassword), ""), NotFound) << "it has changed since";
     EXPECT_THROW(sessions_.Create(*verified, kNow), NotFound) << "a log-in that the change overtook";
     EXPECT_THROW(sessions_.Create(id, kNow), NotFound) << "the account is gone";
 }

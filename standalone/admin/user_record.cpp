@@ -1,0 +1,121 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/user_record.h"
+
+#include <algorithm>
+#include <array>
+#include <utility>
+
+#include "standalone/admin/change.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+using store::CameraAccess;
+using store::DeniableItem;
+using store::Privilege;
+
+constexpr std::array<std::pair<const char*, Privilege>, 3> kPrivileges{
+    {{"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}}};
+constexpr std::array<std::pair<const char*, CameraAccess>, 3> kAccess{
+    {{"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}}};
+constexpr std::array<std::pair<const char*, DeniableItem>, 3> kItems{
+    {{"emap", DeniableItem::kEmap}, {"door", DeniableItem::kDoor}, {"ioModule", DeniableItem::kIoModule}}};
+
+// The ids under the name of each kind.
+template <typename Names, typename Kind>
+void Put(Json::Value& json, const Names& names, const std::map<Kind, std::set<int>>& denied) {
+    for (const auto& [name, kind] : names) {
+        Json::Value& ids = json[name] = Json::arrayValue;
+        if (const auto found = denied.find(kind); found != denied.end()) {
+            for (const int id : found->second) {
+                ids.append(id);
+            }
+        }
+    }
+}
+
+std::set<int> IdsFrom(const Json::Value& json, const std::string& name) {
+    std::set<int> ids;
+    const bool is_list = json.isNull() || (json.isArray() && std::all_of(json.begin(), json.end(), [](const auto& id) {
+                                               return id.isInt() && id.asInt() > 0;
+                                           }));
+    if (!is_list) {
+        throw store::InvalidRecord("deny." + name + " must be a list of ids");
+    }
+    for (const Json::Value& id : json) {
+        ids.insert(id.asInt());
+    }
+    return ids;
+}
+
+// Takes what the names name out of the object; the rest stays.
+template <typename Names, typename Kind>
+void Take(Json::Value& json, const Names& names, const std::string& prefix, std::map<Kind, std::set<int>>& denied) {
+    for (const auto& [name, kind] : names) {
+        denied[kind] = IdsFrom(json[name], prefix + name);
+        json.removeMember(name);
+    }
+}
+
+void RequireObject(const Json::Value& json, const std::string& name) {
+    if (!json.isObject()) {
+        throw store::InvalidRecord(name + " must be an object");
+    }
+}
+
+void RequireEmpty(const Json::Value& json, const std::string& name) {
+    if (!json.empty()) {
+        throw store::InvalidRecord("nothing is called " + json.getMemberNames().front() + " in " + name);
+    }
+}
+
+const char* NameOf(Privilege privilege) {
+    return std::ranges::find(kPrivileges, privilege, &std::pair<const char*, Privilege>::second)->first;
+}
+
+}  // namespace
+
+Json::Value UserRecord(store::Store& store, const store::User& user) {
+    Json::Value json;
+    json["id"] = user.id;
+    json["name"] = user.name;
+    json["privilege"] = NameOf(user.privilege);
+    json["mayMark"] = user.MayMark();
+    json["deny"] = ToJson(store::Users(store).FindDenials(user.id));
+    json["revision"] = Json::Int64{RevisionOf(json)};
+    return json;
+}
+
+store::Privilege PrivilegeFrom(const std::string& name) {
+    const auto* const found = std::ranges::find(kPrivileges, name, &std::pair<const char*, Privilege>::first);
+    if (found == kPrivileges.end()) {
+        throw store::InvalidRecord("privilege must be owner, manager or viewer");
+    }
+    return found->second;
+}
+
+Json::Value ToJson(const store::Denials& denials) {
+    Json::Value json;
+    Put(json, kAccess, denials.cameras);
+    Put(json["group"], kAccess, denials.groups);
+    Put(json, kItems, denials.items);
+    return json;
+}
+
+store::Denials DenialsFrom(const Json::Value& json) {
+    RequireObject(json, "deny");
+    Json::Value rest = json;
+    Json::Value group = rest.get("group", Json::objectValue);
+    RequireObject(group, "deny.group");
+    rest.removeMember("group");
+    store::Denials denials;
+    Take(rest, kAccess, "", denials.cameras);
+    Take(group, kAccess, "group.", denials.groups);
+    Take(rest, kItems, "", denials.items);
+    RequireEmpty(rest, "deny");
+    RequireEmpty(group, "deny.group");
+    return denials;
+}
+
+}  // namespace lookhaven::admin

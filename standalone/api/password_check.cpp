@@ -1,0 +1,85 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/password_check.h"
+
+#include <algorithm>
+
+#include <arpa/inet.h>
+
+#include "standalone/api/login_log.h"
+#include "standalone/base/clock.h"
+#include "standalone/store/login_throttle.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::size_t kMaxHashing = 4;  // at once, in 64 MiB each
+
+// Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
+// All machines of a link share its link-local network.
+std::string NetworkOf(std::string_view address) {
+    in6_addr bytes{};
+    if (::inet_pton(AF_INET6, std::string(address).c_str(), &bytes) != 1 || IN6_IS_ADDR_V4MAPPED(&bytes) ||
+        IN6_IS_ADDR_LINKLOCAL(&bytes)) {
+        return std::string(address);
+    }
+    std::fill(std::begin(bytes.s6_addr) + 8, std::end(bytes.s6_addr), std::uint8_t{0});
+    char text[INET6_ADDRSTRLEN];
+    return std::string(::inet_ntop(AF_INET6, &bytes, text, sizeof text)) + "/64";
+}
+
+void RefuseUnlessNow(int wait_s) {
+    if (wait_s > 0) {
+        throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds", wait_s);
+    }
+}
+
+}  // namespace
+
+HashingPlace::HashingPlace(const Call& call) : slot_(call.slot) {
+    if (!call.slots.BeginHashing(slot_, kMaxHashing)) {
+        throw Failure(503, "too many log-ins at once; try again in a moment", http::kRetrySoonSeconds);
+    }
+}
+
+HashingPlace::~HashingPlace() {
+    control::SlotTable::EndWork(slot_);
+}
+
+store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password) {
+    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+    store::LoginThrottle throttle(call.Records());
+    RefuseUnlessNow(throttle.Wait(account, network, base::WallSeconds()));
+    const HashingPlace place(call);
+    RefuseUnlessNow(throttle.Enter(account, network, base::WallSeconds()));
+    const auto user = store::Users(call.Records()).CheckPassword(account, password);
+    if (!user) {
+        throw Failure(401, "wrong account or password");
+    }
+    throttle.Clear(account, network);
+    return *user;
+}
+
+store::VerifiedUser Reauthenticate(const Call& call, const std::string& parameter) {
+    const Json::Value& password = call.Parameter(parameter);
+    if (password.isNull()) {
+        throw Failure(403, "this needs your own password once more");
+    }
+    const std::string& account = call.login.value().account;
+    try {
+        return CheckPassword(call, account, password.asString());
+    } catch (const Failure& failure) {
+        LogRefused(call.context.Installation(), account, call.request.Header("REMOTE_ADDR"), failure.what());
+        if (failure.Status() == 401) {
+            throw Failure(403, "your own password is wrong");
+        }
+        throw;
+    }
+}
+
+store::HashedPassword Hash(const Call& call, const Json::Value& password) {
+    const HashingPlace place(call);
+    return store::HashedPassword(password.asString());
+}
+
+}  // namespace lookhaven::api

@@ -1,0 +1,37 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Passwords that a caller gives: each costs 64 MiB and a tenth of a second, and a wrong one slows down the next.
+#pragma once
+
+#include <string>
+
+#include "standalone/api/call.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::api {
+
+// Whoever checks or hashes a password on request holds this meanwhile; one at a time in a process.
+class HashingPlace {
+  public:
+    // Throws Failure 503 when there is none.
+    explicit HashingPlace(const Call& call);
+    ~HashingPlace();
+    HashingPlace(const HashingPlace&) = delete;
+    HashingPlace& operator=(const HashingPlace&) = delete;
+
+  private:
+    control::Slot& slot_;
+};
+
+// The account of that name and password. Throws Failure 401 for a wrong one; 429 and 503 for who may not try now: an
+// attempt for which there is no room does not count as one, and one that is barred takes no room.
+store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password);
+
+// The caller, who gives his password once more in the parameter of that name. A wrong one counts and is logged as that
+// of a log-in. Throws Failure 403 for a wrong one, so that a client does not take its session for ended; 429 and 503.
+store::VerifiedUser Reauthenticate(const Call& call, const std::string& parameter);
+
+// Throws Failure 503; store::InvalidRecord for what is no password; Json::Exception for what is no text.
+store::HashedPassword Hash(const Call& call, const Json::Value& password);
+
+}  // namespace lookhaven::api

@@ -1,0 +1,254 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.User: accounts and what they are denied, their sessions; and everybody's own password. Whatever tells of accounts
+// takes POST, too: then no address of it ends up in a log or a browser's history.
+#include <algorithm>
+#include <optional>
+#include <vector>
+
+#include "standalone/admin/change.h"
+#include "standalone/admin/user_record.h"
+#include "standalone/admin/users.h"
+#include "standalone/api/own_apis.h"
+#include "standalone/api/password_check.h"
+#include "standalone/base/clock.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/devices.h"
+#include "standalone/store/emaps.h"
+#include "standalone/store/groups.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/servers.h"
+#include "standalone/store/sessions.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+void RequireNoSecretInQuery(const Call& call) {
+    const Parameters query = ReadQuery(call.request);
+    for (const char* name : {"password", "newPassword", "reauth"}) {
+        if (query.contains(name)) {
+            throw Failure(400, "passwords belong in the body: URLs end up in logs and browser histories");
+        }
+    }
+}
+
+int IdOf(const Call& call) {
+    return call.Parameter("id").asInt();
+}
+
+std::int64_t RevisionOf(const Call& call) {
+    if (call.Parameter("revision").isNull()) {
+        throw Failure(400, "revision is missing: send the one that List told");
+    }
+    return call.Parameter("revision").asInt64();
+}
+
+// With how it is used, which is no part of what its revision stands for.
+Json::Value WithUse(Json::Value record, const std::map<int, store::Sessions::Use>& uses) {
+    const auto use = uses.find(record["id"].asInt());
+    record["sessions"] = use == uses.end() ? 0 : use->second.sessions;
+    record["lastUse"] = use == uses.end() ? Json::Value() : Json::Value(Json::Int64{use->second.last_s});
+    return record;
+}
+
+std::map<int, store::Sessions::Use> Uses(const Call& call) {
+    return store::Sessions(call.Records()).Uses(base::WallSeconds());
+}
+
+std::string AnswerRecord(const Call& call, const Json::Value& record) {
+    Json::Value data;
+    data["user"] = WithUse(record, Uses(call));
+    return SuccessAnswer(data);
+}
+
+// The result of change. Where it was made on a stale record, the current one is told as List tells it.
+template <typename Make>
+auto OnCurrent(const Call& call, Make&& change) {
+    try {
+        return change();
+    } catch (const admin::Stale& stale) {
+        throw admin::Stale(WithUse(stale.Record(), Uses(call)));
+    }
+}
+
+// What is read of each record beside its id and name, too.
+template <typename Records, typename Add>
+Json::Value Named(const Records& records, Add add) {
+    Json::Value list = Json::arrayValue;
+    for (const auto& record : records) {
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = record.id;
+        json["name"] = record.name;
+        add(json, record);
+    }
+    return list;
+}
+
+template <typename Records>
+Json::Value Named(const Records& records) {
+    return Named(records, [](Json::Value&, const auto&) {});
+}
+
+// This host's, then those of recording servers, with the server's name.
+Json::Value CamerasToDeny(store::Store& records) {
+    Json::Value list = Named(store::Cameras(records).List());
+    store::RecordingServers servers(records);
+    const std::vector<store::RecordingServer> known = servers.List();
+    for (const store::RemoteCamera& camera : servers.ListCameras()) {
+        const auto server = std::ranges::find(known, camera.server_id, &store::RecordingServer::id);
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = camera.id;
+        json["name"] = camera.name;
+        json["server"] = server == known.end() ? "" : server->name;
+    }
+    return list;
+}
+
+std::string List(const Call& call) {
+    store::Store& records = call.Records();
+    store::Devices devices(records);
+    const std::map<int, store::Sessions::Use> uses = Uses(call);
+    Json::Value data;
+    data["user"] = Json::arrayValue;
+    for (const store::User& user : store::Users(records).List()) {
+        data["user"].append(WithUse(admin::UserRecord(records, user), uses));
+    }
+    data["camera"] = CamerasToDeny(records);
+    data["group"] = Named(store::Groups(records).List(), [](Json::Value& json, const store::CameraGroup& group) {
+        json["camera"] = Json::arrayValue;
+        for (const int camera : group.camera_ids) {
+            json["camera"].append(camera);
+        }
+    });
+    data["door"] = Named(devices.List(store::EmapItemType::kDoor));
+    data["ioModule"] = Named(devices.List(store::EmapItemType::kIoModule));
+    data["emap"] = Named(store::Emaps(records).List());
+    return SuccessAnswer(data);
+}
+
+// Without the password.
+admin::UserChange RightsOf(const Call& call) {
+    admin::UserChange change;
+    if (const Json::Value& privilege = call.Parameter("privilege"); !privilege.isNull()) {
+        change.privilege = admin::PrivilegeFrom(privilege.asString());
+    }
+    if (const Json::Value& may_mark = call.Parameter("mayMark"); !may_mark.isNull()) {
+        change.may_mark = may_mark.asBool();
+    }
+    if (const Json::Value& deny = call.Parameter("deny"); !deny.isNull()) {
+        change.denials = [wanted = admin::DenialsFrom(deny)](store::Denials& denials) { denials = wanted; };
+    }
+    return change;
+}
+
+std::string Add(const Call& call) {
+    RequireNoSecretInQuery(call);
+    admin::UserChange change = RightsOf(call);
+    Reauthenticate(call, "reauth");
+    change.password = Hash(call, call.Parameter("password"));
+    return AnswerRecord(call, admin::AddUser(call.Records(), call.Actor(), call.Parameter("name").asString(), change));
+}
+
+std::string Set(const Call& call) {
+    RequireNoSecretInQuery(call);
+    const std::int64_t seen = RevisionOf(call);
+    admin::UserChange change = RightsOf(call);
+    const Json::Value& password = call.Parameter("password");
+    if (!password.isNull() || change.privilege) {
+        Reauthenticate(call, "reauth");
+    }
+    if (!password.isNull()) {
+        change.password = Hash(call, password);
+    }
+    return AnswerRecord(
+        call, OnCurrent(call, [&] { return admin::SetUser(call.Records(), call.Actor(), IdOf(call), seen, change); }));
+}
+
+std::string Remove(const Call& call) {
+    RequireNoSecretInQuery(call);
+    const std::int64_t seen = RevisionOf(call);
+    Reauthenticate(call, "reauth");
+    OnCurrent(call, [&] { admin::RemoveUser(call.Records(), call.Actor(), IdOf(call), seen); });
+    return SuccessAnswer(Json::objectValue);
+}
+
+// What names a session here. Not its handle, by which other processes of this machine know it.
+std::string KeyOf(const store::Session& session) {
+    constexpr std::size_t kKeyDigits = 32;
+    return store::Digest("session " + session.handle).substr(0, kKeyDigits);
+}
+
+// The handle of the account's session of that key; one that no session has where there is none.
+std::string HandleOf(const Call& call, const std::string& key) {
+    for (const store::Session& session : store::Sessions(call.Records()).OfUser(IdOf(call), base::WallSeconds())) {
+        if (KeyOf(session) == key) {
+            return session.handle;
+        }
+    }
+    return "";
+}
+
+std::string Sessions(const Call& call) {
+    if (!store::Users(call.Records()).Find(IdOf(call))) {
+        throw Failure(404, "there is no such account");
+    }
+    Json::Value data;
+    data["session"] = Json::arrayValue;
+    for (const store::Session& session : store::Sessions(call.Records()).OfUser(IdOf(call), base::WallSeconds())) {
+        Json::Value& json = data["session"].append(Json::objectValue);
+        json["key"] = KeyOf(session);
+        json["address"] = session.address;
+        json["started"] = Json::Int64{session.created_s};
+        json["lastUse"] = Json::Int64{session.last_seen_s};
+        json["current"] = session.handle == call.login.value().session_handle;
+    }
+    return SuccessAnswer(data);
+}
+
+std::string EndSessions(const Call& call) {
+    const Json::Value& key = call.Parameter("key");
+    Json::Value data;
+    data["ended"] = admin::EndSessions(call.Records(), call.Actor(), IdOf(call),
+                                       key.isNull() ? std::nullopt : std::optional(HandleOf(call, key.asString())),
+                                       call.login.value().session_handle);
+    return SuccessAnswer(data);
+}
+
+std::string Preview(const Call& call) {
+    Json::Value data;
+    data["camera"] = Named(admin::CamerasAsSeenBy(call.Records(), IdOf(call)),
+                           [](Json::Value& json, const admin::VisibleCamera& camera) {
+                               json["live"] = camera.live;
+                               json["audio"] = camera.audio;
+                               json["playback"] = camera.playback;
+                           });
+    return SuccessAnswer(data);
+}
+
+std::string ChangePassword(const Call& call) {
+    RequireNoSecretInQuery(call);
+    const store::VerifiedUser user = Reauthenticate(call, "password");
+    try {
+        admin::ChangePassword(call.Records(), call.Actor().address, user, Hash(call, call.Parameter("newPassword")),
+                              call.login.value().session_handle);
+    } catch (const store::NotFound&) {
+        throw Failure(409, "the account has changed in this moment");
+    }
+    return SuccessAnswer(Json::objectValue);
+}
+
+using enum Method::Effect;
+using enum Method::Audience;
+
+constexpr Method kMethods[] = {
+    {"List", List, kChanges, kManagers},         {"Add", Add, kChanges, kManagers},
+    {"Set", Set, kChanges, kManagers},           {"Remove", Remove, kChanges, kManagers},
+    {"Sessions", Sessions, kChanges, kManagers}, {"EndSessions", EndSessions, kChanges, kManagers},
+    {"Preview", Preview, kChanges, kManagers},   {"ChangePassword", ChangePassword, kChanges}};
+
+}  // namespace
+
+const OwnApi kUserApi{"VEXO.User", kMethods};
+
+}  // namespace lookhaven::api
