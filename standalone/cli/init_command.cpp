@@ -6,10 +6,10 @@
 #include <filesystem>
 #include <system_error>
 
+#include "standalone/admin/mount_claim.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/mount_claim.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
@@ -78,9 +78,10 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.name = "default";
     mount.path = folder.lexically_normal().string();
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
-    RequireFreeFolder(store, mount.path, 0, false);
+    admin::RequireFreeFolder(store, mount.path, 0, false);
     mount.id = mounts.Add(mount);
-    ClaimFolder(store, mount);
+    admin::MarkFolder(store, mount);
+    admin::ReserveNumbers(store, mount);
     return true;
 }
 

@@ -6,6 +6,7 @@
 #include <system_error>
 
 #include "standalone/admin/change.h"
+#include "standalone/admin/mount_claim.h"
 #include "standalone/archive/archive_error.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
@@ -24,6 +25,11 @@ ExitCode CodeOf(const std::system_error& error) {
         return kNoPermission;
     }
     return code == std::errc::no_such_file_or_directory ? kNoInput : kOsError;
+}
+
+ExitCode CodeOf(const admin::UnusableFolder& error) {
+    using Reason = admin::UnusableFolder::Reason;
+    return error.Why() == Reason::kAbsent ? kNoInput : error.Why() == Reason::kNoAccess ? kNoPermission : kDataError;
 }
 
 int Report(const Console& console, ExitCode code, const std::string& sentence) {
@@ -92,6 +98,8 @@ int Run(int argc, char** argv) {
         return Report(console, kDataError, error.what());
     } catch (const admin::StillNeeded& error) {
         return Report(console, kDataError, error.what());
+    } catch (const admin::UnusableFolder& error) {
+        return Report(console, CodeOf(error), error.what());
     } catch (const store::NotFound& error) {
         return Report(console, kNoInput, error.what());
     } catch (const admin::Stale& error) {

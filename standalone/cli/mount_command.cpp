@@ -1,19 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven mount: the folders that recordings are written to.
-#include <filesystem>
 #include <optional>
 
-#include <unistd.h>
-
-#include "standalone/base/clock.h"
+#include "standalone/admin/mounts.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/mount_claim.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/retention.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 
@@ -69,74 +64,39 @@ constexpr Column kColumns[] = {
     {"path", "path"},
     {"", "", StateText}};
 
-// The canonical path, without links and dots.
-std::string RequireFolder(const std::string& path) {
-    std::error_code error;
-    const std::filesystem::path folder = std::filesystem::canonical(path, error);
-    if (error || !std::filesystem::is_directory(folder, error)) {
-        throw Failure(kNoInput, "there is no folder ", path, ": create it, or mount its disk, first");
+admin::MountChange ChangeOf(const Request& request) {
+    admin::MountChange change{.name = request.name, .enabled = request.enabled};
+    if (!request.path.empty()) {
+        change.path = request.path;
     }
-    if (::access(folder.c_str(), R_OK | W_OK | X_OK) != 0) {
-        throw Failure(kNoPermission, "you have no write access to the folder ", path, ": the server needs it");
-    }
-    return folder.string();
-}
-
-void Apply(Mount& mount, const Request& request) {
-    mount.name = request.name.value_or(mount.name);
-    mount.enabled = request.enabled.value_or(mount.enabled);
-    mount.is_default = mount.is_default || request.make_default;
     if (request.limit) {
-        mount.max_bytes = ParseSize(*request.limit);
+        change.max_bytes = ParseSize(*request.limit);
     }
     if (request.max_age) {
-        mount.max_age_s = ParseDuration(*request.max_age);
+        change.max_age_s = ParseDuration(*request.max_age);
     }
-    if (!request.path.empty()) {
-        mount.path = RequireFolder(request.path);
-    }
+    change.is_default = request.make_default;
+    change.take_over = request.take_over;
+    change.confirmed = request.yes;
+    return change;
 }
 
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Mount mount;
-    Apply(mount, request);
-    RequireFreeFolder(store, mount.path, 0, request.take_over);
-    if (mount.name.empty()) {
-        mount.name = std::filesystem::path(mount.path).filename();
-    }
-    mount.id = Mounts(store).Add(mount);
-    ClaimFolder(store, mount);
-    console.Answer(ToData(*Mounts(store).Find(mount.id)), "Added mount ", mount.name, " with id ", mount.id, ".");
-}
-
-// The recorder deletes within seconds what a lower limit leaves no room for.
-void RequireConfirmation(store::Store& store, const Mount& before, const Mount& after) {
-    const std::int64_t now_s = base::WallSeconds();
-    const maintenance::RetentionForecast loss = maintenance::ForecastRetention(store, after, now_s);
-    if (loss.events > maintenance::ForecastRetention(store, before, now_s).events) {
-        throw Failure(kDataError, "this limit deletes the ", loss.events, " oldest recordings (",
-                      FormatSize(loss.bytes), "), up to ", FormatMoment(loss.end_s), "; add --yes to confirm");
-    }
+    const Mount mount = admin::AddMount(store, {}, ChangeOf(request));
+    console.Answer(ToData(mount), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const Mount before = Require(Mounts(store).Find(request.id), "there is no mount ", request.id);
-    Mount mount = before;
-    Apply(mount, request);
-    if (!request.yes) {
-        RequireConfirmation(store, before, mount);
+    try {
+        const Mount mount = admin::SetMount(store, {}, request.id, {}, ChangeOf(request));
+        console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
+    } catch (const admin::DeletesRecordings& refusal) {
+        const maintenance::RetentionForecast& loss = refusal.Loss();
+        throw Failure(kDataError, "this limit deletes the ", loss.events, " oldest recordings (",
+                      FormatSize(loss.bytes), "), up to ", FormatMoment(loss.end_s), "; add --yes to confirm");
     }
-    const bool is_marked = !request.path.empty() || request.take_over;
-    if (is_marked) {
-        RequireFreeFolder(store, RequireFolder(mount.path), mount.id, request.take_over);
-    }
-    Mounts(store).Update(mount);
-    if (is_marked) {
-        ClaimFolder(store, mount);
-    }
-    console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
 }
 
 // Nothing when the disk is not there, fails or does not say.
@@ -173,7 +133,7 @@ void Remove(const Console& console, const Request& request) {
         throw Failure(kDataError, "the mount holds ", events,
                       " events: with --forget they are removed from the store too, while the files stay");
     }
-    Mounts(store).Remove(request.id, request.forget);
+    admin::RemoveMount(store, {}, request.id, {}, request.forget);
     console.Answer(Object("id", request.id, "events_forgotten", events), "Removed mount ", request.id,
                    "; its files stay.");
 }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven setting: what holds for the whole installation.
+#include <algorithm>
 #include <string>
 
 #include "standalone/cli/command_group.h"
@@ -66,6 +67,20 @@ void SetCms(const Console& console, const Request& request) {
     console.Answer(Object("cms", on), "This host ", on ? "manages" : "does not manage", " its recording servers.");
 }
 
+void SetMountFolders(const Console& console, const Request& request) {
+    for (std::size_t at = 0; at <= request.word.size();) {
+        const std::size_t end = std::min(request.word.find(':', at), request.word.size());
+        if (const std::string folder = request.word.substr(at, end - at);
+            folder.size() < 2 || folder.front() != '/' || folder.back() == '/') {
+            throw Failure(kDataError, "each folder begins with / and ends without: /mnt:/media");
+        }
+        at = end + 1;
+    }
+    store::Store store = console.OpenStore();
+    store::Settings(store).Set(store::kMountFoldersSetting, request.word);
+    console.Answer(Object("mount_folders", request.word), "Accounts may add mounts below ", request.word, ".");
+}
+
 void SetMonitorToken(const Console& console, const Request& request) {
     const bool is_new = request.word == "new";
     const std::string token = is_new ? store::RandomHex(store::kMonitorTokenDigits / 2) : "";
@@ -95,6 +110,9 @@ void AddSetting(CLI::App& program, const Console& console) {
     }
     set.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
         .Option("value", set.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
+    set.Add("mount-folders", "Folders below which managers may add mounts in the browser, such as /mnt:/media",
+            SetMountFolders)
+        .Option("value", set.request().word, "The folders, with : between them", Required);
     set.Add("monitor-token", "Token that lets a monitor on another machine read /healthz and /metrics", SetMonitorToken)
         .Option("value", set.request().word, "new: replaces it and prints it, once; off: removes it", Required,
                 Satisfies(CLI::IsMember({"new", "off"})));

@@ -215,6 +215,71 @@ std::map<int, CameraFootage> Events::FootageOfCameras(int camera_id) {
     return footage;
 }
 
+std::vector<RecentFootage> Events::RecordedSince(std::int64_t from_s) {
+    std::vector<RecentFootage> footage;
+    for (const int camera : CamerasOn(0)) {
+        connection_.Read([&](soci::session& sql) {
+            Query<std::tuple<int, std::int64_t, std::int64_t>>(
+                sql, kOnce,
+                "select mount_id, cast(sum(size_bytes) as bigint), min(start_s) from events where camera_id = :camera"
+                " and start_s >= :from and demo = 0 group by mount_id",
+                camera, from_s)
+                .ForEach([&](const auto& row) {
+                    footage.push_back({std::get<0>(row), camera, std::get<1>(row), std::get<2>(row)});
+                });
+        });
+    }
+    return footage;
+}
+
+// By halves: later events have higher orders, and the index knows no dates.
+std::int64_t Events::OrderSince(int mount_id, std::int64_t start_s, std::int64_t low, std::int64_t high) {
+    while (low < high) {
+        const std::int64_t middle = low + (high - low) / 2;
+        const auto next = connection_.FetchOne<std::pair<std::int64_t, std::int64_t>>(
+            "select recording_order, start_s from events where mount_id = :mount and recording_order >= :middle"
+            " and recording = 0 and archived = 0 and demo = 0 order by recording_order, id limit 1",
+            mount_id, middle);
+        if (next && next->second < start_s) {
+            low = next->first + 1;
+        } else {
+            high = middle;
+        }
+    }
+    return low;
+}
+
+std::vector<std::int64_t> Events::BytesByDay(int mount_id, std::int64_t first_day_s, int days) {
+    constexpr std::int64_t kDayS = 86'400;
+    const std::int64_t end =
+        1 + connection_
+                .FetchOne<std::int64_t>("select recording_order from events where mount_id = :mount and recording = 0"
+                                        " and archived = 0 and demo = 0 and recording_order < :none"
+                                        " order by recording_order desc limit 1",
+                                        mount_id, std::numeric_limits<std::int64_t>::max())
+                .value_or(-1);
+    std::vector<std::int64_t> bytes;
+    std::int64_t begin = OrderSince(mount_id, first_day_s, 0, end);
+    for (int day = 1; day <= days; ++day) {
+        const std::int64_t next = OrderSince(mount_id, first_day_s + day * kDayS, begin, end);
+        bytes.push_back(
+            connection_
+                .FetchOne<std::int64_t>(
+                    "select cast(coalesce(sum(size_bytes), 0) as bigint) from events where mount_id = :mount"
+                    " and recording_order >= :begin and recording_order < :next and recording = 0"
+                    " and archived = 0 and demo = 0",
+                    mount_id, begin, next)
+                .value());
+        begin = next;
+    }
+    return bytes;
+}
+
+std::optional<std::int64_t> Events::OldestOn(int mount_id) {
+    const std::vector<Event> first = InRecordingOrder(mount_id, Event(), 1);
+    return first.empty() ? std::nullopt : std::optional(first.front().start_s);
+}
+
 // Steps from camera to camera in the index instead of reading all of it.
 std::set<int> Events::CamerasOn(int mount_id) {
     const std::string from = mount_id == 0 ? " from events where 0 = " : " from events where mount_id = ";

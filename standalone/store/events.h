@@ -98,6 +98,14 @@ struct CameraFootage {
     std::int64_t oldest_s = 0;  // where the oldest begins
 };
 
+// What a camera has on a mount of what was recorded since some moment.
+struct RecentFootage {
+    int mount_id = 0;
+    int camera_id = 0;
+    std::int64_t size_bytes = 0;
+    std::int64_t first_s = 0;
+};
+
 class Events {
   public:
     using Visitor = std::function<void(const Event&)>;
@@ -164,12 +172,22 @@ class Events {
     void VisitMount(int mount_id, const Visitor& visitor);
     // Takes time in proportion to the mount's events: a few tenths of a second for a million.
     MountContent Content(int mount_id);
+    // Growing events too, without demo ones, by camera. Reads a row for each event since then, and none before.
+    std::vector<RecentFootage> RecordedSince(std::int64_t from_s);
+    // What of that many UTC days, the first of which begins then, is left on the mount: bytes a day of finished events
+    // that are not archived, as far as the order of recording tells days apart. Reads the index alone.
+    std::vector<std::int64_t> BytesByDay(int mount_id, std::int64_t first_day_s, int days);
+    // When the event began that was recorded to the mount first; nothing when there is none.
+    std::optional<std::int64_t> OldestOn(int mount_id);
     // The cameras, removed ones too, that have events on the mount; mount 0: on any.
     std::set<int> CamerasOn(int mount_id);
     // By camera, those without any left out. camera_id 0: of all, which reads every row: half a second for a million.
     std::map<int, CameraFootage> FootageOfCameras(int camera_id = 0);
 
   private:
+    // The order from which on the mount's events began then or later, between those two.
+    std::int64_t OrderSince(int mount_id, std::int64_t start_s, std::int64_t low, std::int64_t high);
+
     Connection& connection_;
 };
 

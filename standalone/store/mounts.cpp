@@ -112,18 +112,19 @@ void Mounts::Update(const Mount& mount) {
     });
 }
 
+void Mounts::ForgetEvents(int id) {
+    connection_.Write([&](soci::session& sql) { RequireFree(sql, RequireMount(sql, id)); });
+    ForgetRows(connection_, id);
+}
+
 void Mounts::Remove(int id, bool forget_events) {
-    const Mount mount = connection_.Write([&](soci::session& sql) {
-        Mount found = RequireMount(sql, id);
-        RequireFree(sql, found);
-        return found;
-    });
     if (forget_events) {
-        ForgetRows(connection_, id);
+        ForgetEvents(id);
     }
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        RequireFree(sql, RequireMount(sql, id));
+        const Mount mount = RequireMount(sql, id);
+        RequireFree(sql, mount);
         const int held = CountRows(sql, "events", id) + CountRows(sql, "marks", id);
         if (held > 0) {
             throw InvalidRecord("the mount \"" + mount.name + "\" holds " + std::to_string(held) + " recordings");

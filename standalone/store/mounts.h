@@ -39,6 +39,8 @@ class Mounts {
     // for the default while there are others, for a mount that a camera's plan names, and, without forget_events, for
     // one that holds events or saved marks.
     void Remove(int id, bool forget_events);
+    // The first part of that: removes the rows, and leaves the mount. Throws as Remove does then.
+    void ForgetEvents(int id);
 
     // Keeps later cameras and events from getting numbers that footage on a mount has already: raises the counters to
     // these where they are below.

@@ -17,6 +17,10 @@ namespace lookhaven::store {
 constexpr const char* kMonitorTokenSetting = "monitor_token";
 constexpr std::size_t kMonitorTokenDigits = 48;  // hexadecimal
 
+// Below which folders an account may add mounts, as in PATH: what a stolen account can have written must be bounded.
+constexpr const char* kMountFoldersSetting = "mount_folders";
+constexpr const char* kMountFolders = "/mnt:/media:/srv";
+
 class Settings {
   public:
     // The store must outlive this object.

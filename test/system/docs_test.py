@@ -24,12 +24,14 @@ def shape(value):
 
 
 def words(server):
-    """What stands for the words with a dollar sign: an event of the demo, the day around it, and the account viewer."""
+    """What stands for the words with a dollar sign: an event of the demo, the day around it, the mount and the account viewer."""
     now = int(time.time())
     accounts = server.request(call("VEXO.User", "List"), "admin", {}).json["data"]["user"]
+    mounts = server.request(call("VEXO.Mount", "List"), "admin", {}).json["data"]["mount"]
     return {
         "$ADMIN_PASSWORD": PASSWORDS["admin"].replace(" ", "+"),
         "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),
+        "$MOUNT_REVISION": str(mounts[0]["revision"]),
         "$REVISION": str(next(one["revision"] for one in accounts if one["name"] == "viewer")),
         "$EVENT": str(recorded_events(server, 1)[0]["id"]),
         "$FROM": str(now - 86400),

@@ -58,6 +58,10 @@ Relay.Play server=2 camera={camera}                                   E      E  
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
 POST System.Audit                                                     E      E     F       F     F    F       F        F      D       E
+POST Mount.List                                                       E      E     F       F     F    F       F        F      D       E
+POST Mount.Add path=/etc                                              E      E     F       F     F    F       F        F      B       E
+POST Mount.Set id={mount} revision=1                                  E      E     F       F     F    F       F        F      C/N     E
+POST Mount.Remove id={mount} revision=1                               E      E     F       F     F    F       F        F      C/N     E
 POST User.List                                                        E      E     F       F     F    F       F        F      D       E
 POST User.Add name=new password=long-enough reauth=own                E      E     F       F     F    F       F        F      D       E
 POST User.Set id={user} revision=1 mayMark=true                       E      E     F       F     F    F       F        F      C/N     E
@@ -138,7 +142,7 @@ class RightsTest(unittest.TestCase):
         server.session("ended")
         server.cli("user", "passwd", "ended", text="another secret")
         marks = server.request(call("VEXO.Event", "List", cameralists=2, kind="alert"), "manager").json["data"]["event"]
-        cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "event": recorded_events(server, 2)[0]["id"],
+        cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "mount": 1, "event": recorded_events(server, 2)[0]["id"],
                    "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"],
                    "user": next(one["id"] for one in json.loads(server.cli("user", "list", "--json")) if one["name"] == "ended")}
 

@@ -1,0 +1,287 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Mount: storage mounts: what they hold, for how long it lasts, and their limits.
+#include <algorithm>
+#include <cerrno>
+#include <cmath>
+#include <map>
+#include <optional>
+#include <vector>
+
+#include <unistd.h>
+
+#include "standalone/admin/change.h"
+#include "standalone/admin/mount_claim.h"
+#include "standalone/admin/mount_forecast.h"
+#include "standalone/admin/mount_place.h"
+#include "standalone/admin/mounts.h"
+#include "standalone/api/own_apis.h"
+#include "standalone/archive/layout.h"
+#include "standalone/base/clock.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/mount_status.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/events.h"
+#include "standalone/store/settings.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+using maintenance::MountState;
+
+constexpr std::int64_t kDayS = 86'400;
+constexpr std::int64_t kRateDays = 7;
+constexpr int kHistoryDays = 30;
+constexpr double kMaxLimitBytes = 9e15;  // exact in JavaScript
+constexpr double kMaxLimitDays = 36'500;
+
+// What all mounts are described by.
+struct Surroundings {
+    std::int64_t now_s = base::WallSeconds();
+    std::vector<maintenance::MountStatus> states;  // as the recorder that runs sees them
+    std::vector<store::RecentFootage> recent;
+    std::map<int, std::string> camera_names;
+};
+
+Surroundings SurroundingsOf(const Call& call) {
+    const base::Installation& installation = call.context.Installation();
+    Surroundings known;
+    if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
+        known.states = maintenance::ReadMountStatus(installation);
+    }
+    known.recent = store::Events(call.Records()).RecordedSince(known.now_s - kRateDays * kDayS);
+    for (const store::Camera& camera : store::Cameras(call.Records()).List()) {
+        known.camera_names[camera.id] = camera.name;
+    }
+    return known;
+}
+
+struct Condition {
+    std::string state = "ready";
+    std::string message = {};
+    std::optional<maintenance::MountSpace> space = {};
+};
+
+// As its folder is found.
+Condition Inspect(store::Store& records, const store::Mount& mount) {
+    const auto marker = maintenance::MountFolder::ReadMarker(mount.path);
+    if (!marker) {
+        return {"absent", "the folder is missing or not marked as this mount's: its disk is not mounted"};
+    }
+    if (*marker != maintenance::MarkerFor(records, mount.id)) {
+        return {"foreign", "the folder is marked as that of another mount or installation"};
+    }
+    const maintenance::MountSpace space = maintenance::OpenMount(records, mount).value().Space();
+    if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
+        return errno == EROFS ? Condition{"read-only", "its disk takes no changes", space}
+                              : Condition{"no-access", "the server has no write access to the folder", space};
+    }
+    if (space.free_bytes < space.ReserveBytes() || space.free_files < space.ReserveFiles()) {
+        return {"full", "its disk is full", space};
+    }
+    return {"ready", "", space};
+}
+
+Condition ConditionOf(store::Store& records, const store::Mount& mount, const Surroundings& known) {
+    Condition condition;
+    try {
+        condition = Inspect(records, mount);
+    } catch (const std::system_error& error) {
+        return {"failing", error.what()};
+    } catch (const std::bad_optional_access&) {  // unmounted in this moment
+        return {"absent", "its disk is not mounted"};
+    }
+    for (const maintenance::MountStatus& status : known.states) {
+        const bool tells_more = status.state == MountState::kInUse || status.state == MountState::kFailing ||
+                                status.state == MountState::kSpaceHeld;
+        if (status.mount == mount.id && condition.state == "ready" && tells_more) {
+            condition.state = maintenance::NameOf(status.state);
+            condition.message = status.state == MountState::kInUse       ? "another recorder works on it"
+                                : status.state == MountState::kSpaceHeld ? "what was deleted does not become free"
+                                                                         : status.reason;
+        }
+    }
+    return condition;
+}
+
+// By camera, with a name where the camera was not removed. Returns the sum.
+double AddRates(const store::Mount& mount, const Surroundings& known, Json::Value& list) {
+    double sum = 0;
+    list = Json::arrayValue;
+    for (const store::RecentFootage& footage : known.recent) {
+        if (footage.mount_id != mount.id) {
+            continue;
+        }
+        const double rate = admin::BytesPerDay(footage.size_bytes, footage.first_s, kRateDays * kDayS, known.now_s);
+        const auto name = known.camera_names.find(footage.camera_id);
+        Json::Value& json = list.append(Json::objectValue);
+        json["id"] = footage.camera_id;
+        json["name"] = name == known.camera_names.end() ? "" : name->second;
+        json["perDay"] = Json::Int64{std::llround(rate)};
+        sum += rate;
+    }
+    return sum;
+}
+
+Json::Value History(store::Events& events, const store::Mount& mount, std::int64_t now_s) {
+    const std::int64_t first_s = (now_s / kDayS - (kHistoryDays - 1)) * kDayS;
+    Json::Value list = Json::arrayValue;
+    std::int64_t day_s = first_s;
+    for (const std::int64_t bytes : events.BytesByDay(mount.id, first_s, kHistoryDays)) {
+        Json::Value& json = list.append(Json::objectValue);
+        json["day"] = archive::DayOf(day_s);
+        json["bytes"] = Json::Int64{bytes};
+        day_s += kDayS;
+    }
+    return list;
+}
+
+Json::Value OrNull(const std::optional<std::int64_t>& number) {
+    return number ? Json::Value(Json::Int64{*number}) : Json::Value();
+}
+
+Json::Value Describe(store::Store& records, const store::Mount& mount, const Surroundings& known) {
+    store::Events events(records);
+    const Condition condition = ConditionOf(records, mount, known);
+    const bool has_size = condition.space && condition.space->total_bytes > 0;
+    admin::MountFigures figures{.used_bytes = events.Content(mount.id).size_bytes,
+                                .is_there = has_size,
+                                .max_bytes = mount.max_bytes,
+                                .max_age_s = mount.max_age_s};
+    Json::Value json = admin::MountRecord(mount);
+    json["state"] = condition.state;
+    json["message"] = condition.message;
+    json["total"] = OrNull(has_size ? std::optional(condition.space->total_bytes) : std::nullopt);
+    json["free"] = OrNull(has_size ? std::optional(condition.space->free_bytes) : std::nullopt);
+    json["used"] = Json::Int64{figures.used_bytes};
+    json["oldest"] = OrNull(events.OldestOn(mount.id));
+    if (has_size) {
+        figures.free_bytes = condition.space->free_bytes;
+        figures.reserve_bytes = condition.space->ReserveBytes();
+    }
+    figures.bytes_per_day = AddRates(mount, known, json["camera"]);
+    json["perDay"] = Json::Int64{std::llround(figures.bytes_per_day)};
+    const std::optional<double> days = admin::DaysUntilDeleted(figures);
+    json["lastsDays"] = days ? Json::Value(*days) : Json::Value();
+    json["history"] = History(events, mount, known.now_s);
+    return json;
+}
+
+std::string AnswerRecord(const Call& call, const store::Mount& mount) {
+    Json::Value data;
+    data["mount"] = Describe(call.Records(), mount, SurroundingsOf(call));
+    return SuccessAnswer(data);
+}
+
+// The result of change. Where it was made on a stale record, the current one is told as List tells it.
+template <typename Make>
+auto OnCurrent(const Call& call, Make&& change) {
+    try {
+        return change();
+    } catch (const admin::Stale& stale) {
+        const auto mount = store::Mounts(call.Records()).Find(stale.Record()["id"].asInt());
+        throw mount ? admin::Stale(Describe(call.Records(), *mount, SurroundingsOf(call))) : stale;
+    }
+}
+
+std::int64_t RevisionOf(const Call& call) {
+    if (call.Parameter("revision").isNull()) {
+        throw Failure(400, "revision is missing: send the one that List told");
+    }
+    return call.Parameter("revision").asInt64();
+}
+
+// Of a number above 0, in units; null is no limit, and one that is missing stays.
+std::optional<std::int64_t> LimitOf(const Call& call, const std::string& name, double max, double unit) {
+    if (!call.parameters.contains(name)) {
+        return std::nullopt;
+    }
+    const Json::Value& value = call.Parameter(name);
+    if (value.isNull()) {
+        return 0;
+    }
+    const double number = value.isNumeric() ? value.asDouble() : 0;
+    if (!(number * unit >= 1 && number <= max)) {
+        throw Failure(400, name + " must be a number above 0, or null for no limit");
+    }
+    return std::llround(number * unit);
+}
+
+admin::MountChange ChangeOf(const Call& call) {
+    admin::MountChange change;
+    if (const Json::Value& name = call.Parameter("name"); !name.isNull()) {
+        change.name = name.asString();
+    }
+    if (const Json::Value& enabled = call.Parameter("enabled"); !enabled.isNull()) {
+        change.enabled = enabled.asBool();
+    }
+    change.max_bytes = LimitOf(call, "limitBytes", kMaxLimitBytes, 1);
+    change.max_age_s = LimitOf(call, "limitDays", kMaxLimitDays, kDayS);
+    change.is_default = call.Parameter("default").asBool();
+    change.confirmed = call.Parameter("confirm").asBool();
+    return change;
+}
+
+std::string List(const Call& call) {
+    const Surroundings known = SurroundingsOf(call);
+    Json::Value data;
+    data["mount"] = Json::arrayValue;
+    for (const store::Mount& mount : store::Mounts(call.Records()).List()) {
+        data["mount"].append(Describe(call.Records(), mount, known));
+    }
+    return SuccessAnswer(data);
+}
+
+std::string Add(const Call& call) {
+    admin::MountChange change = ChangeOf(call);
+    change.path = call.Parameter("path").asString();
+    admin::RequireMountPlace(call.Records(), call.context.Installation(), *change.path);
+    try {
+        return AnswerRecord(call, admin::AddMount(call.Records(), call.Actor(), change));
+    } catch (const admin::UnusableFolder& error) {
+        const bool is_taken = error.Why() == admin::UnusableFolder::Reason::kTaken;
+        throw Failure(400, is_taken ? "the folder belongs to another mount or installation" : error.what());
+    } catch (const std::system_error& error) {
+        throw Failure(400, "the folder cannot be used: " + error.code().message());
+    }
+}
+
+std::string Set(const Call& call) {
+    const std::int64_t seen = RevisionOf(call);
+    const admin::MountChange change = ChangeOf(call);
+    try {
+        return AnswerRecord(call, OnCurrent(call, [&] {
+                                return admin::SetMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen,
+                                                       change);
+                            }));
+    } catch (const admin::DeletesRecordings& refusal) {
+        Json::Value data;
+        data["confirm"]["events"] = Json::Int64{refusal.Loss().events};
+        data["confirm"]["bytes"] = Json::Int64{refusal.Loss().bytes};
+        data["confirm"]["until"] = Json::Int64{refusal.Loss().end_s};
+        return SuccessAnswer(data);
+    }
+}
+
+std::string Remove(const Call& call) {
+    const std::int64_t seen = RevisionOf(call);
+    OnCurrent(call,
+              [&] { admin::RemoveMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen, false); });
+    return SuccessAnswer(Json::objectValue);
+}
+
+using enum Method::Effect;
+using enum Method::Audience;
+
+constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},
+                               {"Add", Add, kChanges, kManagers},
+                               {"Set", Set, kChanges, kManagers},
+                               {"Remove", Remove, kChanges, kManagers}};
+
+}  // namespace
+
+const OwnApi kMountApi{"VEXO.Mount", kMethods};
+
+}  // namespace lookhaven::api
