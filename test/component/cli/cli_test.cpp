@@ -169,7 +169,7 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
           {"camera remove 6", 0, "Removed"},
           {"audit", 0, "camera.remove  y (6)"},
           {"audit --limit 2 --json", 0, "\"action\" : \"camera.set\"", "camera.add"},
-          {"audit --before 2", 0, "camera.add     Front door (5)", "camera.set"},
+          {"audit --before 2", 0, "camera.add  Front door (5)", "camera.set"},
           {"camera remove 6", 66, "no camera 6"},
           {"camera remove 2147483648", 64, "malformed"},
           {"camera remove abc", 64, "malformed"},

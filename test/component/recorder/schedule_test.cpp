@@ -52,7 +52,9 @@ TEST_F(ScheduleTest, APlanIsFollowedHourByHour) {
     ::setenv("TZ", "UTC0", 1);
     constexpr std::int64_t kHour = 3600;
     constexpr std::int64_t kMonday = 1'795'996'800;
-    CameraPlan plan{"Gate", RecordMode::kSchedule, 60, 10};
+    CameraPlan plan;
+    plan.mode = RecordMode::kSchedule;
+    plan.pre_s = 10;
     plan.hours = "012" + std::string(165, '0');
     const struct {
         const char* what;
