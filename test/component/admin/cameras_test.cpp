@@ -6,6 +6,7 @@
 #include <thread>
 
 #include "standalone/admin/change.h"
+#include "standalone/camera/isolated_source.h"
 #include "standalone/store/audit_log.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
@@ -17,13 +18,8 @@ namespace {
 
 using store::Engine;
 using store::EngineName;
-using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::Not;
-
-std::unique_ptr<media::Source> Open(const std::string&, const media::SourceOptions&, std::stop_token) {
-    return nullptr;
-}
 
 class CameraChangeTest : public store::StoreTest {
   protected:
@@ -51,7 +47,7 @@ class CameraChangeTest : public store::StoreTest {
         return event.id;
     }
 
-    const media::SourceKinds kinds_ = {{"http://", Open}, {"rtsp://", Open}};
+    const media::SourceKinds kinds_ = camera::NetworkKinds();
 };
 
 TEST_P(CameraChangeTest, AnAddressIsOfAKnownKindAndHoldsNoSecret) {
@@ -159,7 +155,7 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     {
         const std::jthread recorder([this, growing] {
             store::Store store = store::Store::Open(url_);
-            while (store::Cameras(store).List().size() > 0) {
+            while (!store::Cameras(store).List().empty()) {
                 std::this_thread::yield();
             }
             store::Events(store).Finish(growing, 1, 1, 1);
