@@ -2,21 +2,25 @@
 //
 // Starts the web client. Where things are:
 //
-//   wire/      the network: the web API (server, recordings, emaps), the parts of an endless answer (multipart), requests that
-//              end in time (deadline) and take turns (semaphore)
+//   wire/      the network: the web API (server, recordings, emaps; for managers camera_setup, people, mounts, audit), the
+//              parts of an endless answer (multipart), requests that end in time (deadline) and take turns (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
 //   playback/  recordings: what is known of them (footage_cache, recorded_days); a player plays one, sync_playback those of
 //              several cameras at the same time
 //   ui/        app goes from screen to screen
-//     screens/    what fills the window: log-in, wall, events, maps; what they have in common (screen), and their addresses (route)
+//     screens/    what fills the window: log-in, wall, events, maps, settings; what they have in common (screen), and their
+//                 addresses (route)
 //     wall/       the grid of tiles and its layouts
 //     camera/     one camera live: its picture, the large view, snapshots
 //     events/     the stage of players with its transport controls; calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     widgets/    what all of these use: elements, buttons, icons, texts, titles, notices, keys, panning and zooming
+//     settings/   the sections of the settings: cameras, people, storage, activity. Each has a list and a page of one record
+//                 (page, record_form), which notices what others have changed meanwhile (merge, conflict_panel)
+//     widgets/    what all of these use: elements, buttons, icons, fields, dialogs, texts, titles, notices, keys, panning and
+//                 zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
 //
 // ui may use live, playback and wire; live and playback use wire. Nothing here writes markup from text (see dom), and the page
@@ -37,6 +41,13 @@ import "./style/event_list.css";
 import "./style/timeline.css";
 import "./style/map.css";
 import "./style/map_editor.css";
+import "./style/form.css";
+import "./style/account.css";
+import "./style/settings.css";
+import "./style/cameras.css";
+import "./style/people.css";
+import "./style/storage.css";
+import "./style/activity.css";
 import { App } from "./ui/app";
 
 void new App(document.querySelector<HTMLElement>("#app")!).start();

@@ -41,7 +41,8 @@ await visit(async (page, complaints) => {
   await page.screenshot({ path: `${folder}/large.png` });
   await page.keyboard.press("Escape");
 
-  await page.getByRole("button", { name: "Log out admin" }).click();
+  await page.getByRole("button", { name: "Account admin" }).click();
+  await page.getByRole("button", { name: "Log out" }).click();
   await page.getByRole("button", { name: "Log in" }).waitFor();
   await report("logged out", { complaints });
 });

@@ -9,14 +9,15 @@ import { loginScreen } from "./screens/login_screen";
 import { MapsScreen } from "./screens/maps_screen";
 import { followRoute, openScreen } from "./screens/route";
 import type { Kept, Screen } from "./screens/screen";
+import { SettingsScreen } from "./screens/settings_screen";
 import { WallScreen } from "./screens/wall_screen";
 import { AbsentCameras } from "./wall/absent_cameras";
 import { element } from "./widgets/dom";
 import { hideNotice } from "./widgets/notice";
 import { titleScreen } from "./widgets/title";
 
-const keptFor = (userId: number): Kept => ({ userId, absentCameras: new AbsentCameras(), mapDraft: null });
-const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen };
+const keptFor = (userId: number): Kept => ({ userId, absentCameras: new AbsentCameras(), mapDraft: null, settingsDraft: null });
+const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen, settings: SettingsScreen };
 
 export class App {
   readonly #root: HTMLElement;

@@ -24,6 +24,9 @@ export interface Camera {
   server?: number;
 }
 
+/** What a picture is asked for with. */
+export type StillCamera = Pick<Camera, "id" | "video_type" | "server">;
+
 /** Answer of LoadCamera. */
 export interface CameraList {
   /** Absent when no camera is enabled. */
@@ -53,13 +56,15 @@ export class ServerError extends Error {
     readonly status: number,
     readonly code: number,
     message: string,
+    /** What the answer tells beside the sentence: the record as it is now where a change came too late (409). */
+    readonly data: unknown = null,
   ) {
     super(message);
   }
 }
 
 interface Failure {
-  error?: { code?: number; message?: string };
+  error?: { code?: number; message?: string; data?: unknown };
 }
 
 function sentenceFor(status: number, serverMessage: string | undefined): string {
@@ -76,6 +81,8 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
       return "The camera sends no picture.";
     default:
       if (status >= 500) return `The server could not answer (${status}).`;
+      // A whole sentence was written for the user.
+      if (serverMessage?.endsWith(".")) return serverMessage;
       return serverMessage ? `The server refused: ${serverMessage}.` : "The server refused.";
   }
 }
@@ -87,7 +94,8 @@ async function failureOf(answer: Response): Promise<ServerError> {
   } catch {
     // A web server's own error page is not JSON; the status says enough.
   }
-  return new ServerError(answer.status, failure.error?.code ?? 0, sentenceFor(answer.status, failure.error?.message));
+  const { code = 0, message, data } = failure.error ?? {};
+  return new ServerError(answer.status, code, sentenceFor(answer.status, message), data ?? null);
 }
 
 export class Server {
@@ -130,7 +138,7 @@ export class Server {
   }
 
   /** One picture in the camera's usual size. */
-  async snapshot(camera: Camera, owner?: AbortSignal, timeoutMs = kAnswerTimeoutMs): Promise<Snapshot> {
+  async snapshot(camera: StillCamera, owner?: AbortSignal, timeoutMs = kAnswerTimeoutMs): Promise<Snapshot> {
     const deadline = new Deadline(timeoutMs, owner);
     try {
       const answer = await this.#still(camera, deadline);
@@ -144,7 +152,7 @@ export class Server {
   }
 
   // A JPEG camera's picture comes as it is; of other cameras the host makes one.
-  #still(camera: Camera, deadline: Deadline): Promise<Response> {
+  #still(camera: StillCamera, deadline: Deadline): Promise<Response> {
     const own = camera.video_type === kVideoTypeMjpeg || camera.server ? playOf(camera, { snapshot: "1" }) : null;
     if (own) return this.media(...own, deadline);
     return this.media("VEXO.Picture", "Get", { camera: String(camera.id) }, deadline);
@@ -175,14 +183,17 @@ export class Server {
     throw failure.status === 502 ? new ServerError(502, failure.code, "No picture was received.") : failure;
   }
 
-  /** The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported. */
+  /**
+   * The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported. `signal`
+   * ends the request.
+   */
   async call<Data>(
     api: string,
     method: string,
     parameters: Record<string, string>,
-    how: { form?: Record<string, string>; json?: unknown; quiet?: boolean } = {},
+    how: { form?: Record<string, string>; json?: unknown; quiet?: boolean; signal?: AbortSignal; timeoutMs?: number } = {},
   ): Promise<Data> {
-    const deadline = new Deadline(kAnswerTimeoutMs);
+    const deadline = new Deadline(how.timeoutMs ?? kAnswerTimeoutMs, how.signal);
     try {
       const answer = await fetch(address(api, method, parameters), {
         signal: deadline.signal,
@@ -205,7 +216,7 @@ export class Server {
 }
 
 /** How a camera's live view is asked for: the host fetches another server's cameras for us. */
-function playOf({ id, server }: Camera, more: Record<string, string>): [string, string, Record<string, string>] {
+function playOf({ id, server }: StillCamera, more: Record<string, string>): [string, string, Record<string, string>] {
   const camera = String(id);
   if (server) return ["VEXO.Relay", "Play", { server: String(server), camera, ...more }];
   return ["VEXO.Lookhaven.Player.LiveviewSrc", "Play", { camera, ...more }];

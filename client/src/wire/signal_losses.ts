@@ -25,6 +25,11 @@ const kCauses: Record<string, string> = {
   stalled: "no picture in time",
 };
 
+/** In few words, for the user. */
+export function causeText(cause: string): string {
+  return kCauses[cause] ?? "failure";
+}
+
 export class SignalLosses {
   readonly #server: Server;
   readonly #known = new Map<number, SignalLoss>();
@@ -39,7 +44,7 @@ export class SignalLosses {
       const { camera } = await this.#server.call<CameraStates>("VEXO.Catalog", "CameraStates", {}, { quiet: true });
       this.#known.clear();
       for (const { id, no_signal: lost } of camera) {
-        if (lost) this.#known.set(id, { sinceMs: lost.since * 1000, cause: kCauses[lost.cause] ?? "failure" });
+        if (lost) this.#known.set(id, { sinceMs: lost.since * 1000, cause: causeText(lost.cause) });
       }
     } catch {
       // As before.

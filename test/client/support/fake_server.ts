@@ -11,6 +11,7 @@ import { extname, join } from "node:path";
 import { Readable } from "node:stream";
 import { pipeline } from "node:stream/promises";
 import { FakeArchive } from "./fake_archive";
+import { FakeSetup, type SetupMethod } from "./fake_setup";
 
 const kPolicy =
   "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
@@ -29,6 +30,9 @@ export class FakeServer {
   readonly streams: string[] = [];
   /** Data of further answers, by method. */
   answers: Record<string, unknown> = {};
+  /** What managers set up. */
+  readonly setup = new FakeSetup();
+  isManager = true;
   /** The content of every map. */
   emap: unknown = null;
   polls = 0;
@@ -68,6 +72,8 @@ export class FakeServer {
     if (method === "Login") this.hasSession = true;
     if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
     if (method === "Logout") this.hasSession = false;
+    const change = this.setup.methods[`${searchParams.get("api")}.${method}`];
+    if (change) return void this.#setUp(change, request, answer);
     if (method! in this.answers) return json(answer, 200, { success: true, data: this.answers[method!] });
     if (method === "Get" && searchParams.get("api") === "VEXO.Picture") return this.#snapshot(answer);
     if (searchParams.get("itemType") === "1" && this.emap) return json(answer, 200, { success: true, data: this.emap });
@@ -77,8 +83,15 @@ export class FakeServer {
     }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
     const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
-    const account = { account: "admin", user_id: 1, is_manager: true, players_per_session: this.archive.playersPerSession };
+    const account = { account: "admin", user_id: 1, is_manager: this.isManager, players_per_session: this.archive.playersPerSession };
     json(answer, 200, { success: true, data: method === "LoadCamera" ? list : account });
+  }
+
+  async #setUp(change: SetupMethod, request: IncomingMessage, answer: ServerResponse): Promise<void> {
+    let body = "";
+    for await (const piece of request) body += String(piece);
+    const { status, ...envelope } = change(JSON.parse(body) as never);
+    json(answer, status, envelope);
   }
 
   async #recordings(query: URLSearchParams, request: IncomingMessage, answer: ServerResponse): Promise<void> {

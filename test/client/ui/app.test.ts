@@ -64,6 +64,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       ["#camera=1", ".large[data-state=live]"],
       ["#event=2", ".stage-picture[data-state=playing]"],
       ["#maps", ".map-item"],
+      ["#settings", ".settings-state"],
     ] as const) {
       await page.evaluate((to) => void (location.hash = to), hash);
       await page.waitForSelector(content);

@@ -10,13 +10,17 @@ const kLinks: [ScreenName, IconName, label: string, href: string][] = [
   ["wall", "live", "Live", "#"],
   ["events", "events", "Events", "#events"],
   ["maps", "map", "Maps", "#maps"],
+  ["settings", "settings", "Settings", "#settings"],
 ];
 
-export function navigation(current: ScreenName): HTMLElement {
-  const links = kLinks.map(([screen, name, label, href]) => {
-    const link = element("a", { class: "nav-link", href }, icon(name), element("span", {}, label));
-    if (screen === current) link.setAttribute("aria-current", "page");
-    return link;
-  });
+/** Those who are no managers have no settings. */
+export function navigation(current: ScreenName, isManager: boolean): HTMLElement {
+  const links = kLinks
+    .filter(([screen]) => isManager || screen !== "settings")
+    .map(([screen, name, label, href]) => {
+      const link = element("a", { class: "nav-link", href }, icon(name), element("span", {}, label));
+      if (screen === current) link.setAttribute("aria-current", "page");
+      return link;
+    });
   return element("nav", { class: "nav", "aria-label": "Screens" }, ...links);
 }

@@ -2,7 +2,8 @@
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
 // there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps,
-// and there #map=2, and of that map a camera, #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3.
+// and there #map=2, and of that map a camera, #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings,
+// and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or a new one, &open=new.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
@@ -10,11 +11,14 @@
 import type { FootageRef } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 
-export type ScreenName = "wall" | "events" | "maps";
+export type ScreenName = "wall" | "events" | "maps" | "settings";
+export const kSettingsSections = ["cameras", "people", "storage", "activity"] as const;
+export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;
 /** Browsers refuse to change the address more often than a few times a second. */
 const kRecordIntervalMs = 500;
+const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?)?$/;
 
 /** What an entry of the browser's history keeps beside its address. */
@@ -78,6 +82,7 @@ function opened(): { what: string; id: number; atMs: number | null } | null {
 
 export function openScreen(): ScreenName {
   if (location.hash === "#maps" || kMapPattern.test(location.hash)) return "maps";
+  if (kSettingsPattern.test(location.hash)) return "settings";
   const what = opened()?.what;
   return location.hash === "#events" || (what !== undefined && what !== "camera") ? "events" : "wall";
 }
@@ -158,5 +163,27 @@ export function leaveMapCamera(): void {
   if (!open?.camera) return;
   if (hasOpener()) return history.back();
   replace(`#map=${open.map}`, false);
+  announce();
+}
+
+export interface OpenSettings {
+  section: SettingsSection;
+  /** A record of it; null: the list of all. */
+  open: number | "new" | null;
+}
+
+export function openSettings(): OpenSettings {
+  const [, section, open] = kSettingsPattern.exec(location.hash) ?? [];
+  const known = kSettingsSections.find((name) => name === section) ?? "cameras";
+  return { section: known, open: open === "new" ? "new" : open ? Number(open) : null };
+}
+
+export function settingsAddress(section: SettingsSection, open: OpenSettings["open"] = null): string {
+  return `#settings=${section}${open === null ? "" : `&open=${open}`}`;
+}
+
+/** From a record to the list that it is in; Back does not lead to the record again. */
+export function leaveSettingsRecord(): void {
+  replace(settingsAddress(openSettings().section), false);
   announce();
 }

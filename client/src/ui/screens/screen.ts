@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every screen of a logged-in user has: title and heading, the bar with navigation, clock and log-out, the progress
+// What every screen of a logged-in user has: title and heading, the bar with navigation, clock and account, the progress
 // line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may leave.
 
 import type { EditedMap } from "../../wire/emaps";
 import type { Account, Server } from "../../wire/server";
+import type { Draft } from "../settings/record_form";
 import type { AbsentCameras } from "../wall/absent_cameras";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
@@ -13,12 +14,12 @@ import { isForFocused } from "../widgets/key_owner";
 import { KeysDialog, type KeyList } from "../widgets/keys_dialog";
 import { clockTime } from "../widgets/text";
 import { titleScreen } from "../widgets/title";
-import { logOutButton } from "./log_out";
+import { AccountMenu } from "./account_menu";
 import { navigation } from "./navigation";
 import type { ScreenName } from "./route";
 
 const kClockMs = 500;
-const kNames: Record<ScreenName, string> = { wall: "Live", events: "Events", maps: "Maps" };
+const kNames: Record<ScreenName, string> = { wall: "Live", events: "Events", maps: "Maps", settings: "Settings" };
 
 /** What the page remembers of an account from one screen or session to the next. */
 export interface Kept {
@@ -26,6 +27,8 @@ export interface Kept {
   readonly absentCameras: AbsentCameras;
   /** Changes to a map that were not saved when the session ended. */
   mapDraft: EditedMap | null;
+  /** The same of the settings' page with this address. */
+  settingsDraft: { address: string; draft: Draft } | null;
 }
 
 /** What a screen is opened with. */
@@ -57,10 +60,11 @@ export abstract class Screen {
     const brand = element("div", { class: "brand" }, icon("lighthouse"), element("span", {}, "Lookhaven"), this.#heading);
     const keys = iconButton("keys", "Keys", () => this.#keysDialog.show(this.keys), "?");
     keys.classList.add("show-keys");
-    const logOut = logOutButton(session, () => this.canLeave(), (isBusy) => (this.progress.hidden = !isBusy));
-    const bar = element("header", { class: "bar" }, brand, navigation(name), this.#clock, keys, logOut);
+    const account = new AccountMenu(session, () => this.canLeave(), (isBusy) => (this.progress.hidden = !isBusy));
+    const links = navigation(name, session.account.is_manager);
+    const bar = element("header", { class: "bar" }, brand, links, this.#clock, keys, account.button);
     this.front = element("div", { class: `front ${name}` }, bar, this.progress);
-    this.root = element("main", { class: "screen" }, this.front, this.#keysDialog.root);
+    this.root = element("main", { class: "screen" }, this.front, this.#keysDialog.root, account.root);
     // Before the control that has the focus, which gets what the screen leaves to it.
     document.addEventListener("keydown", (event) => this.#onKey(event), { signal: this.closed, capture: true });
     const showTime = () => setText(this.#clock, clockTime(Date.now()));
@@ -115,10 +119,15 @@ export abstract class Screen {
   protected abstract pressKey(event: KeyboardEvent): boolean;
 
   #onKey(event: KeyboardEvent): void {
-    if (event.altKey || event.ctrlKey || event.metaKey || this.#keysDialog.isOpen || isForFocused(event)) return;
+    if (event.altKey || event.ctrlKey || event.metaKey || isCovered() || isForFocused(event)) return;
     if (event.key === "?") this.#keysDialog.show(this.keys);
     else if (!this.pressKey(event)) return;
     event.preventDefault();
     event.stopPropagation();
   }
+}
+
+/** Keys, account and forms keep the screen's keys out, wherever a click has left the focus; a screen's own dialog does not. */
+function isCovered(): boolean {
+  return document.querySelector("dialog:is(.keys, .account-menu)[open]") !== null;
 }

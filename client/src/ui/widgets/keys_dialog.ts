@@ -18,10 +18,6 @@ export class KeysDialog {
     this.root.addEventListener("click", (event) => event.target === this.root && this.root.close());
   }
 
-  get isOpen(): boolean {
-    return this.root.open;
-  }
-
   show(list: KeyList): void {
     const head = element(
       "header",

@@ -33,7 +33,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       () => page.click(".nav-link"),
       () => page.evaluate(() => history.back()),
       () => page.evaluate(() => location.reload()),
-      () => page.click(".log-out"),
+      () => page.click(".account").then(() => page.click(".log-out")),
       () => page.evaluate(() => void (location.hash = "#map=2")),
       () => page.selectOption(".map-names", "2"),
     ];

@@ -1,0 +1,90 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What users do with their own account: change its password, log out. Opened from the bar of each screen.
+
+import { People } from "../../wire/people";
+import { ServerError } from "../../wire/server";
+import { iconButton } from "../widgets/button";
+import { element } from "../widgets/dom";
+import { secretField } from "../widgets/fields";
+import { openDialog } from "../widgets/form_dialog";
+import { icon, type IconName } from "../widgets/icons";
+import { notify } from "../widgets/notice";
+import type { Session } from "./screen";
+
+const kMinPasswordBytes = 8;
+
+/** A sentence where a new password that was typed twice cannot be taken. */
+export function passwordProblem(password: string, again: string): string {
+  const isShort = new TextEncoder().encode(password).length < kMinPasswordBytes;
+  if (isShort) return `A password has at least ${kMinPasswordBytes} characters.`;
+  return password === again ? "" : "The two new passwords are not the same.";
+}
+
+export class AccountMenu {
+  readonly button: HTMLButtonElement;
+  readonly root: HTMLDialogElement;
+  readonly #session: Session;
+  readonly #canLeave: () => boolean;
+  readonly #showBusy: (isBusy: boolean) => void;
+
+  /**
+   * Logs nobody out where `canLeave` returns false. `showBusy` is called when a log-out begins (true) and when it failed
+   * (false).
+   */
+  constructor(session: Session, canLeave: () => boolean, showBusy: (isBusy: boolean) => void) {
+    this.#session = session;
+    this.#canLeave = canLeave;
+    this.#showBusy = showBusy;
+    const name = session.account.account;
+    this.button = iconButton("account", `Account ${name}`, () => this.root.showModal());
+    this.button.classList.add("account");
+    this.button.setAttribute("aria-haspopup", "dialog");
+    this.root = element(
+      "dialog",
+      { class: "account-menu", "aria-label": `Account ${name}` },
+      element("p", { class: "account-name" }, name),
+      this.#item("edit", "Change password", "change-password", () => void this.#changePassword()),
+      this.#item("logout", "Log out", "log-out", () => this.#logOut()),
+    );
+    this.root.addEventListener("click", (event) => event.target === this.root && this.root.close());
+  }
+
+  #item(name: IconName, label: string, look: string, onClick: () => void): HTMLButtonElement {
+    const item = element("button", { type: "button", class: `account-item ${look}` }, icon(name), element("span", {}, label));
+    item.addEventListener("click", () => {
+      this.root.close();
+      onClick();
+    });
+    return item;
+  }
+
+  #logOut(): void {
+    if (!this.#canLeave()) return;
+    const { server, onLogOut } = this.#session;
+    this.#showBusy(true);
+    server.logout().then(onLogOut, (error: unknown) => {
+      this.#showBusy(false);
+      if (error instanceof ServerError && error.status === 401) return;
+      notify(`You are still logged in: ${error instanceof ServerError ? error.message : String(error)}`);
+    });
+  }
+
+  async #changePassword(): Promise<void> {
+    const password = secretField("Your password until now", "", "current-password");
+    const wanted = secretField("New password", "At least eight characters.");
+    const again = secretField("New password once more");
+    const isDone = await openDialog(this.root.parentElement!, {
+      title: "Change your password",
+      content: [password.root, wanted.root, again.root],
+      submit: "Change",
+      attempt: async () => {
+        const problem = password.value ? passwordProblem(wanted.value, again.value) : "Please enter your password until now.";
+        if (problem) return problem;
+        await new People(this.#session.server).changePassword(password.value, wanted.value);
+        return undefined;
+      },
+    });
+    if (isDone) notify("Your password is changed.");
+  }
+}

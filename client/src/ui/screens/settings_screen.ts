@@ -1,0 +1,144 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The settings' screen, for managers: its sections, and in each a list or one record of it.
+
+import { ActivityPage } from "../settings/activity/activity_page";
+import { CameraPage } from "../settings/cameras/camera_page";
+import { CamerasPage } from "../settings/cameras/cameras_page";
+import { noRightState, type Page, type PageContext } from "../settings/page";
+import { PeoplePage } from "../settings/people/people_page";
+import { PersonPage } from "../settings/people/person_page";
+import { MountPage } from "../settings/storage/mount_page";
+import { StoragePage } from "../settings/storage/storage_page";
+import { element } from "../widgets/dom";
+import { icon, type IconName } from "../widgets/icons";
+import type { KeyList } from "../widgets/keys_dialog";
+import { titleScreen } from "../widgets/title";
+import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "./route";
+import { Screen, type Kept, type Session } from "./screen";
+
+const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {
+  cameras: ["Cameras", "camera"],
+  people: ["People", "people"],
+  storage: ["Storage", "storage"],
+  activity: ["Activity", "activity"],
+};
+
+const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
+  cameras: CamerasPage,
+  people: PeoplePage,
+  storage: StoragePage,
+  activity: ActivityPage,
+};
+
+const kRecords: Partial<Record<SettingsSection, new (context: PageContext, id: number | "new") => Page>> = {
+  cameras: CameraPage,
+  people: PersonPage,
+  storage: MountPage,
+};
+
+export class SettingsScreen extends Screen {
+  readonly #session: Session;
+  readonly #kept: Kept;
+  readonly #links: HTMLAnchorElement[] = [];
+  readonly #place = element("div", { class: "settings-page" });
+  #page: Page | null = null;
+  /** The address of the page. */
+  #address = "";
+  /** The user has agreed to lose the changes. */
+  #discards = false;
+
+  constructor(session: Session) {
+    super("settings", session);
+    this.#session = session;
+    this.#kept = session.kept;
+    this.progress.hidden = true;
+    this.addToBar(element("span", { class: "bar-gap" }));
+    if (!session.account.is_manager) {
+      this.#place.append(noRightState());
+      this.front.append(element("div", { class: "settings-body" }, this.#place));
+      return;
+    }
+    for (const [section, [label, name]] of Object.entries(kSections) as [SettingsSection, [string, IconName]][]) {
+      const href = settingsAddress(section);
+      this.#links.push(element("a", { class: "settings-link", href }, icon(name), element("span", {}, label)));
+    }
+    const sections = element("nav", { class: "settings-nav", "aria-label": "Settings" }, ...this.#links);
+    this.front.append(element("div", { class: "settings-body" }, sections, this.#place));
+    addEventListener("beforeunload", (event) => this.#page?.isChanged && event.preventDefault(), { signal: this.closed });
+    this.#open();
+  }
+
+  override close(): void {
+    super.close();
+    this.#closePage();
+  }
+
+  /** Asks first where changes would be lost. */
+  override canLeave(): boolean {
+    if (!this.#page?.isChanged) return true;
+    return (this.#discards = confirm("Leave without saving your changes?"));
+  }
+
+  followRoute(): boolean {
+    if (addressOf(openSettings()) === this.#address || !this.#session.account.is_manager) return true;
+    if (!this.#discards && !this.canLeave()) return false;
+    this.#open();
+    this.#place.querySelector<HTMLElement>("h2")?.focus({ preventScroll: true });
+    return true;
+  }
+
+  protected get keys(): KeyList {
+    return [
+      ["Tab", "From control to control"],
+      ["Up Down", "On a handle in the list of cameras: move the camera"],
+      ["Left Right Up Down", "In the recording plan: from hour to hour; with Shift paint on the way"],
+      ["0 1 2", "In the recording plan: never, always, on alarm"],
+    ];
+  }
+
+  protected pressKey(): boolean {
+    return false;
+  }
+
+  #open(): void {
+    this.#closePage();
+    const route = openSettings();
+    this.#address = addressOf(route);
+    const draft = this.#kept.settingsDraft?.address === this.#address ? this.#kept.settingsDraft.draft : null;
+    if (draft) this.#kept.settingsDraft = null;
+    const leave = (isAsked: boolean) => {
+      this.#discards = !isAsked;
+      leaveSettingsRecord();
+    };
+    const context: PageContext = {
+      server: this.server,
+      account: this.#session.account,
+      draft,
+      leave: () => leave(true),
+      done: () => leave(false),
+    };
+    const record = route.open === null ? undefined : kRecords[route.section];
+    this.#page = record ? new record(context, route.open!) : new kLists[route.section](context);
+    this.#place.replaceChildren(this.#page.root);
+    this.#place.scrollTop = 0;
+    titleScreen(kSections[route.section][0]);
+    this.#links.forEach((link) => {
+      if (link.getAttribute("href") === settingsAddress(route.section)) link.setAttribute("aria-current", "page");
+      else link.removeAttribute("aria-current");
+    });
+  }
+
+  #closePage(): void {
+    const draft = this.#discards ? null : (this.#page?.draft ?? null);
+    // Nobody was asked: the session has ended.
+    if (draft) this.#kept.settingsDraft = { address: this.#address, draft };
+    this.#page?.close();
+    this.#page = null;
+    this.#discards = false;
+  }
+}
+
+function addressOf({ section, open }: OpenSettings): string {
+  return settingsAddress(section, open);
+}

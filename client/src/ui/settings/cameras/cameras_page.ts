@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// All cameras with their pictures and states, in the order that everyone gets them.
+
+import { CameraSetup, type CameraSetupList } from "../../../wire/camera_setup";
+import { Semaphore } from "../../../wire/semaphore";
+import { asServerError } from "../../../wire/server";
+import { settingsAddress } from "../../screens/route";
+import { element, setText } from "../../widgets/dom";
+import { notify } from "../../widgets/notice";
+import { orderHandle } from "../../widgets/order_list";
+import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
+import { CameraRow } from "./camera_row";
+
+const kStatesIntervalMs = 4_000;
+const kPicturesIntervalMs = 30_000;
+const kPicturesAtOnce = 2;
+/** Of several moves one after the other, the last is stored. */
+const kOrderDelayMs = 500;
+
+export class CamerasPage extends LoadedPage<CameraSetupList> {
+  readonly #setup: CameraSetup;
+  readonly #count = element("p", { class: "quiet settings-count" });
+  readonly #list = element("ol", { class: "settings-list cameras-list" });
+  readonly #pictures = new Semaphore(kPicturesAtOnce);
+  #rows: CameraRow[] = [];
+  /** Until this is null, the server's own order is an older one. */
+  #ordering: ReturnType<typeof setTimeout> | null = null;
+
+  constructor(context: PageContext) {
+    super(context, "Cameras", linkButton("Add a camera", settingsAddress("cameras", "new"), true));
+    this.#setup = new CameraSetup(context.server);
+    const ask = (footage: boolean) => () => this.#setup.list({ footage });
+    void this.start(ask(true), (list) => {
+      this.#showList(list);
+      this.refresh(kStatesIntervalMs, ask(false), (newer) => this.#showList(newer));
+      const timer = setInterval(() => this.#loadPictures(this.#rows), kPicturesIntervalMs);
+      this.closed.addEventListener("abort", () => clearInterval(timer));
+    });
+  }
+
+  override close(): void {
+    super.close();
+    if (this.#ordering) void this.#storeOrder();
+  }
+
+  #showList({ camera, group }: CameraSetupList): void {
+    if (this.#ordering || this.#list.querySelector(".is-dragged")) return;
+    if (camera.length === 0) {
+      this.#rows = [];
+      const add = linkButton("Add the first camera", settingsAddress("cameras", "new"), true);
+      const sentence = "There are no cameras yet. All that is needed is the camera's address in your network, and its account.";
+      return this.show(emptyState("camera", sentence, add));
+    }
+    const inOrder = [...camera].sort((one, other) => one.order - other.order);
+    const added: CameraRow[] = [];
+    const rows = inOrder.map((one) => {
+      const row = this.#rows.find(({ id }) => id === one.id) ?? new CameraRow(this.context.server, one, group);
+      if (!this.#rows.includes(row)) {
+        row.root.prepend(orderHandle(this.#list, row.root, one.name, () => this.#order()));
+        added.push(row);
+      }
+      row.show(one, group);
+      return row;
+    });
+    this.#rows = rows;
+    // Elements that are moved lose the focus.
+    if (rows.some(({ root }, at) => this.#list.children[at] !== root) || this.#list.children.length !== rows.length) {
+      this.#list.replaceChildren(...rows.map(({ root }) => root));
+    }
+    const live = camera.filter(({ state }) => state === "running").length;
+    setText(this.#count, `${live} of ${camera.length} live. Drag the handles to change the order of the wall.`);
+    if (!this.#list.isConnected) this.show(this.#count, this.#list);
+    this.#loadPictures(added);
+  }
+
+  #loadPictures(rows: readonly CameraRow[]): void {
+    if (document.hidden) return;
+    for (const row of rows) void this.#pictures.run(this.closed, () => row.loadPicture(this.closed)).catch(() => undefined);
+  }
+
+  #order(): void {
+    if (this.#ordering) clearTimeout(this.#ordering);
+    this.#ordering = setTimeout(() => void this.#storeOrder(), kOrderDelayMs);
+  }
+
+  async #storeOrder(): Promise<void> {
+    const moved = this.#ordering;
+    if (moved) clearTimeout(moved);
+    try {
+      await this.#setup.order([...this.#list.children].map((child) => Number((child as HTMLElement).dataset.camera)));
+    } catch (error) {
+      notify(`The order is not saved. ${asServerError(error).message}`);
+    } finally {
+      if (this.#ordering === moved) this.#ordering = null;
+    }
+  }
+}

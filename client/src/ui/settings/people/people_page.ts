@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// All accounts: what each may do, whether it is in use, and when it last was.
+
+import { People, type UserList, type UserRecord } from "../../../wire/people";
+import { settingsAddress } from "../../screens/route";
+import { counted } from "../../widgets/amounts";
+import { element } from "../../widgets/dom";
+import { minuteText } from "../../widgets/text";
+import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
+import { kPrivilegeNames, rightsSummary } from "./rights";
+
+export class PeoplePage extends LoadedPage<UserList> {
+  constructor(context: PageContext) {
+    super(context, "People", linkButton("Add an account", settingsAddress("people", "new"), true));
+    void this.start(
+      () => new People(context.server).list(),
+      (list) => this.#showList(list),
+    );
+  }
+
+  #showList(list: UserList): void {
+    const rows = list.user.map((user) => this.#row(user, list));
+    const sentence = "You are alone. Give everyone an account of their own, and only the rights that they need.";
+    const alone = emptyState("people", sentence);
+    this.show(element("ul", { class: "settings-list" }, ...rows), ...(list.user.length === 1 ? [alone] : []));
+  }
+
+  #row(user: UserRecord, list: UserList): HTMLElement {
+    const { id, name, privilege, sessions, lastUse, deny, mayMark } = user;
+    const isOwn = id === this.context.account.user_id;
+    const used = lastUse ? `last used ${minuteText(lastUse * 1000)}` : "never used";
+    const marks = mayMark && privilege === "viewer" ? ", reports alarms" : "";
+    const part = (look: string, ...texts: string[]) =>
+      element("div", { class: look }, ...texts.map((text) => element("span", {}, text)));
+    const link = element("a", { class: "row-link", href: settingsAddress("people", id) }, name);
+    return element(
+      "li",
+      { class: "person-row" },
+      element("div", { class: "person-name" }, link, element("span", { class: "quiet" }, isOwn ? "you" : "")),
+      part("person-facts", kPrivilegeNames[privilege], `sees ${rightsSummary(deny, list)}${marks}`),
+      part("person-facts quiet", sessions > 0 ? `${counted(sessions, "session")} open` : "not logged in", used),
+    );
+  }
+}

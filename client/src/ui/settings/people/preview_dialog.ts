@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Shows what an account sees, as the server judges it.
+
+import { kCameraRights, type People, type UserRecord } from "../../../wire/people";
+import { asServerError } from "../../../wire/server";
+import { element } from "../../widgets/dom";
+import { openDialog } from "../../widgets/form_dialog";
+import { notify } from "../../widgets/notice";
+import { plainTable, scrolled } from "../../widgets/table";
+import { kRightNames } from "./rights";
+
+/** `isChanged`: what is shown is stored, and the form holds something else. */
+export async function showPreview(
+  host: HTMLElement,
+  people: People,
+  { id, name }: UserRecord,
+  isChanged: boolean,
+): Promise<void> {
+  const cameras = await people.preview(id).catch((error: unknown) => void notify(asServerError(error).message));
+  if (!cameras) return;
+  const rows = cameras.map((camera) => {
+    const cells = kCameraRights.map((right) => element("td", {}, camera[right] ? "yes" : "–"));
+    return element("tr", {}, element("th", { scope: "row" }, camera.name), ...cells);
+  });
+  const table = plainTable(["Camera", ...kCameraRights.map((right) => kRightNames[right])], rows);
+  const seen = cameras.length > 0 ? scrolled("Cameras", table) : element("p", {}, "No camera at all.");
+  const note = isChanged ? [element("p", { class: "form-hint" }, "As stored: your changes are not saved yet.")] : [];
+  await openDialog(host, { title: `What ${name} sees`, content: [...note, seen], submit: "", attempt: async () => undefined });
+}

@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The open sessions of an account: where each is used, and when it was last; one or all of them are ended.
+
+import type { OpenSession, People } from "../../../wire/people";
+import { asServerError } from "../../../wire/server";
+import { counted } from "../../widgets/amounts";
+import { element } from "../../widgets/dom";
+import { openDialog } from "../../widgets/form_dialog";
+import { notify } from "../../widgets/notice";
+import { plainTable, scrolled } from "../../widgets/table";
+import { minuteText } from "../../widgets/text";
+import { button } from "../page";
+
+export class SessionsPanel {
+  readonly root = element("div", { class: "form-group" });
+  readonly #people: People;
+  readonly #user: number;
+
+  constructor(people: People, user: number) {
+    this.#people = people;
+    this.#user = user;
+    void this.load();
+  }
+
+  async load(): Promise<void> {
+    this.root.replaceChildren(element("p", { class: "quiet" }, "Loading…"));
+    try {
+      this.#show(await this.#people.sessions(this.#user));
+    } catch (error) {
+      const again = button("Try again", () => void this.load());
+      this.root.replaceChildren(element("p", { role: "alert" }, asServerError(error).message), again);
+    }
+  }
+
+  #show(sessions: readonly OpenSession[]): void {
+    const none = element("p", { class: "quiet" }, "Nobody is logged in with this account.");
+    if (sessions.length === 0) return this.root.replaceChildren(none);
+    const rows = sessions.map(({ key, address, started, lastUse, current }) => {
+      const end = button("End", () => void this.#end(`The session from ${address} is ended.`, key));
+      end.setAttribute("aria-label", `End the session from ${address}`);
+      const last = current ? element("span", {}, "this session") : end;
+      const cells = [minuteText(started * 1000), minuteText(lastUse * 1000)].map((text) => element("td", {}, text));
+      return element("tr", {}, element("th", { scope: "row" }, address), ...cells, element("td", {}, last));
+    });
+    const table = scrolled("Sessions", plainTable(["From", "Since", "Last use", ""], rows));
+    const others = sessions.filter(({ current }) => !current).length;
+    const all = button(sessions.length === others ? "End all" : "End all others", () => void this.#endAll(others));
+    all.disabled = others === 0;
+    this.root.replaceChildren(table, element("div", { class: "form-buttons" }, all));
+  }
+
+  async #end(said: string, key: string): Promise<void> {
+    try {
+      await this.#people.endSessions(this.#user, key);
+      notify(said);
+    } catch (error) {
+      notify(asServerError(error).message);
+    }
+    await this.load();
+  }
+
+  async #endAll(count: number): Promise<void> {
+    const isDone = await openDialog(this.root, {
+      title: `End ${counted(count, "session")}?`,
+      content: [element("p", {}, "Whoever uses them must log in again.")],
+      submit: "End them",
+      attempt: async () => {
+        notify(`${counted(await this.#people.endSessions(this.#user), "session")} ended.`);
+      },
+    });
+    if (isDone) await this.load();
+  }
+}

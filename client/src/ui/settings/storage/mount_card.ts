@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One mount: how much of it is used, for how long it lasts, and what each camera needs.
+
+import type { MountRecord } from "../../../wire/mounts";
+import { settingsAddress } from "../../screens/route";
+import { bytesText } from "../../widgets/amounts";
+import { element } from "../../widgets/dom";
+import { svgElement } from "../../widgets/svg";
+import { plainTable } from "../../widgets/table";
+import { minuteText } from "../../widgets/text";
+import { linkButton } from "../page";
+import { historyPlot } from "./history_plot";
+import { forecastText, limitText, stateText } from "./storage_text";
+
+export function mountCard(mount: MountRecord): HTMLElement {
+  const { id, name, path, enabled, state, message } = mount;
+  const isWell = state === "ready";
+  const marks = [mount.default ? "default" : "", stateText(mount)].filter((text) => text).join(" · ");
+  const head = element(
+    "header",
+    { class: "mount-head" },
+    element("h3", {}, name),
+    element("span", { class: isWell || !enabled ? "quiet" : "mount-trouble" }, marks),
+    element("span", { class: "bar-gap" }),
+    linkButton("Change", settingsAddress("storage", id)),
+  );
+  head.lastElementChild!.setAttribute("aria-label", `Change ${name}`);
+  const trouble = message ? [element("p", { class: "mount-trouble" }, message)] : [];
+  const fact = (label: string, text: string) => element("div", {}, element("dt", {}, label), element("dd", {}, text));
+  const oldest = mount.oldest ? minuteText(mount.oldest * 1000) : "none";
+  const facts = element(
+    "dl",
+    { class: "mount-facts" },
+    fact("Recordings", bytesText(mount.used)),
+    fact("Free", `${bytesText(mount.free)} of ${bytesText(mount.total)}`),
+    fact("Oldest footage", oldest),
+    fact("A day", bytesText(mount.perDay)),
+    fact("Limits", limitText(mount.limit)),
+  );
+  return element(
+    "li",
+    { class: "mount-card" },
+    head,
+    element("p", { class: "quiet mount-path" }, path),
+    ...trouble,
+    ...(mount.total > 0 ? [usageBar(mount)] : []),
+    element("p", { class: "mount-forecast" }, forecastText(mount.lastsDays)),
+    facts,
+    historyPlot(mount.history),
+    ...cameras(mount),
+  );
+}
+
+function usageBar({ total, free, used }: MountRecord): HTMLElement {
+  const whole = Math.max(total, 1);
+  const other = Math.max(0, total - free - used);
+  const rect = (look: string, from: number, bytes: number) =>
+    svgElement("rect", { class: look, x: from / whole, y: 0, width: bytes / whole, height: 1 });
+  const label = `${bytesText(used)} of recordings, ${bytesText(other)} of other files, ${bytesText(free)} free`;
+  const bar = svgElement(
+    "svg",
+    { class: "usage", viewBox: "0 0 1 1", preserveAspectRatio: "none", role: "img", "aria-label": label },
+    rect("usage-used", 0, used),
+    rect("usage-other", used, other),
+  );
+  const key = (look: string, text: string) => element("span", { class: `usage-key ${look}` }, text);
+  const keys = [key("used", "recordings"), key("other", "other files"), key("free", "free")];
+  return element("div", {}, bar, element("p", { class: "usage-keys", "aria-hidden": "true" }, ...keys));
+}
+
+function cameras({ camera }: MountRecord): HTMLElement[] {
+  if (camera.length === 0) return [];
+  const most = [...camera].sort((one, other) => other.perDay - one.perDay);
+  const rows = most.map(({ name, perDay }) => {
+    const need = element("td", {}, `${bytesText(perDay)} a day`);
+    return element("tr", {}, element("th", { scope: "row" }, name), need);
+  });
+  const summary = element("summary", {}, `By camera (${camera.length})`);
+  return [element("details", { class: "form-more" }, summary, plainTable([], rows))];
+}

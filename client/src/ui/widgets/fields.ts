@@ -1,0 +1,148 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The fields of forms: each has its label, a hint where one helps, and a value that can be read and shown. Their changes
+// reach the form as the browser's own "input" events.
+
+import type { Named } from "../../wire/camera_setup";
+import { element } from "./dom";
+
+export interface Field<Value> {
+  readonly root: HTMLElement;
+  value: Value;
+}
+
+export interface TextField extends Field<string> {
+  readonly input: HTMLInputElement;
+}
+
+let count = 0;
+
+/** A control with its label above, and a hint below. */
+function labelled(label: string, control: HTMLElement, hint: string): HTMLElement {
+  const id = `field-${(count += 1)}`;
+  control.id = id;
+  const root = element("div", { class: "form-field" }, element("label", { for: id }, label), control);
+  if (hint) {
+    control.setAttribute("aria-describedby", `${id}-hint`);
+    root.append(element("p", { class: "form-hint", id: `${id}-hint` }, hint));
+  }
+  return root;
+}
+
+export function textField(label: string, attributes: Record<string, string | boolean> = {}, hint = ""): TextField {
+  const more = { type: "text", autocomplete: "off", spellcheck: "false", ...attributes };
+  const input = element("input", { class: "input", ...more });
+  return {
+    root: labelled(label, input, hint),
+    input,
+    get value() {
+      return input.value;
+    },
+    set value(text: string) {
+      input.value = text;
+    },
+  };
+}
+
+/** For a password that is chosen, which browsers shall not fill in; `autocomplete` otherwise. */
+export function secretField(label: string, hint = "", autocomplete = "new-password"): TextField {
+  return textField(label, { type: "password", autocomplete, maxlength: "1024" }, hint);
+}
+
+/** Null where nothing is typed. */
+export function numberField(label: string, min: number, max: number, hint = ""): Field<number | null> {
+  const limits = { min: String(min), max: String(max), step: "any", inputmode: "decimal" };
+  const { root, input } = textField(label, { type: "number", ...limits }, hint);
+  return {
+    root,
+    get value() {
+      return input.value === "" ? null : Number(input.value);
+    },
+    set value(number: number | null) {
+      input.value = number === null ? "" : String(number);
+    },
+  };
+}
+
+export function selectField(
+  label: string,
+  options: readonly (readonly [value: string, text: string])[],
+  hint = "",
+): Field<string> {
+  const made = options.map(([value, text]) => element("option", { value }, text));
+  const select = element("select", { class: "input" }, ...made);
+  return {
+    root: labelled(label, select, hint),
+    get value() {
+      return select.value;
+    },
+    set value(value: string) {
+      select.value = value;
+    },
+  };
+}
+
+export function checkField(label: string, hint = ""): Field<boolean> {
+  const box = element("input", { type: "checkbox" });
+  const root = element("div", { class: "form-check" }, element("label", {}, box, element("span", {}, label)));
+  if (hint) {
+    const text = element("p", { class: "form-hint", id: `field-${(count += 1)}` }, hint);
+    box.setAttribute("aria-describedby", text.id);
+    root.append(text);
+  }
+  return {
+    root,
+    get value() {
+      return box.checked;
+    },
+    set value(isChecked: boolean) {
+      box.checked = isChecked;
+    },
+  };
+}
+
+/** One of a few, all of them in sight. */
+export function radioField<Value extends string>(
+  label: string,
+  options: readonly (readonly [value: Value, text: string])[],
+): Field<Value> {
+  const name = `field-${(count += 1)}`;
+  const boxes = options.map(([value]) => element("input", { type: "radio", name, value }));
+  const labels = boxes.map((box, at) => element("label", { class: "chip" }, box, element("span", {}, options[at]![1])));
+  const chips = element("div", { class: "chips" }, ...labels);
+  return {
+    root: element("fieldset", { class: "form-choice" }, element("legend", {}, label), chips),
+    get value() {
+      return (boxes.find((box) => box.checked)?.value ?? options[0]![0]) as Value;
+    },
+    set value(value: Value) {
+      for (const box of boxes) box.checked = box.value === value;
+    },
+  };
+}
+
+/** Any of a few; the value has the ids of those that are ticked, in rising order. */
+export function chipsField(label: string, choices: readonly Named[]): Field<number[]> {
+  const boxes = choices.map(({ id }) => element("input", { type: "checkbox", value: String(id) }));
+  const labels = boxes.map((box, at) => element("label", { class: "chip" }, box, element("span", {}, choices[at]!.name)));
+  const chips = element("div", { class: "chips" }, ...labels);
+  return {
+    root: element("fieldset", { class: "form-choice" }, element("legend", {}, label), chips),
+    get value() {
+      const ticked = boxes.filter((box) => box.checked).map((box) => Number(box.value));
+      return ticked.sort((one, other) => one - other);
+    },
+    set value(ids: number[]) {
+      for (const box of boxes) box.checked = ids.includes(Number(box.value));
+    },
+  };
+}
+
+/** Part of a form, under a heading. */
+export function formPart(heading: string, ...content: Node[]): HTMLElement {
+  return element("section", { class: "form-part" }, element("h3", {}, heading), ...content);
+}
+
+export function formRow(...fields: Field<never>[] | { root: HTMLElement }[]): HTMLElement {
+  return element("div", { class: "form-row" }, ...fields.map(({ root }) => root));
+}

@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Cameras as managers set them up. All of it is for managers only.
+
+import type { Server } from "./server";
+
+export interface Named {
+  id: number;
+  name: string;
+}
+
+export interface CameraSource {
+  /** 0 high, 1 low, 2 mobile. */
+  profile: number;
+  address: string;
+  /** What is asked of the camera; 0 or absent: as it comes. */
+  width?: number;
+  height?: number;
+  fps?: number;
+}
+
+export interface RecordingPlan {
+  /** "schedule" goes by `hours`. */
+  mode: "never" | "always" | "schedule";
+  /** Seconds; how long a file becomes. */
+  segment: number;
+  /** Seconds before and after an alarm that are kept with it. */
+  pre: number;
+  post: number;
+  /** 0: the default mount. */
+  mount: number;
+  profile: number;
+  /** A character for each hour of the week, from Monday 00:00 on: 0 never, 1 always, 2 on alarm. */
+  hours: string;
+}
+
+/** What a manager may change, apart from the password. */
+export interface CameraSettings {
+  name: string;
+  enabled: boolean;
+  source: CameraSource[];
+  account: string;
+  /** Takes any TLS certificate. */
+  insecure: boolean;
+  audio: boolean;
+  ptz: boolean;
+  liveProfile: number;
+  /** Ids of its groups. */
+  group: number[];
+  plan: RecordingPlan;
+}
+
+export interface CameraRecord extends CameraSettings {
+  id: number;
+  revision: number;
+  /** Its place on the wall. */
+  order: number;
+  hasPassword: boolean;
+  codec: string;
+  /** "idle": nobody asks for its picture; "unknown": the recorder does not run. */
+  state: "running" | "connecting" | "no-signal" | "off" | "idle" | "unknown";
+  /** Why there is no signal; may be empty. */
+  reason: string;
+  /** What becomes of its recording, such as "recording" or "disk-full"; empty where it has none. */
+  recording: string;
+  /** Unix seconds, of the state. */
+  since: number | null;
+  /** Pictures and bytes a second. */
+  rate: number;
+  bytes: number;
+  /** Null in a list without it. */
+  footage: { events: number; bytes: number; oldest: number | null } | null;
+}
+
+export interface CameraSetupList {
+  camera: CameraRecord[];
+  group: Named[];
+  mount: (Named & { default: boolean })[];
+  /** Usual paths of RTSP addresses. */
+  path: { name: string; path: string }[];
+}
+
+export interface ProbeRequest {
+  address: string;
+  account: string;
+  insecure: boolean;
+  /** Absent: the one that `camera` has. */
+  password?: string;
+  camera?: number;
+}
+
+export interface ProbeResult {
+  codec: string;
+  width: number;
+  height: number;
+  rate: number;
+  audio: boolean;
+  /** A JPEG picture in base64; may be empty. */
+  picture: string;
+}
+
+export interface ProbeFailure {
+  failed: string;
+  message: string;
+}
+
+/** Longer than a camera may take to answer. */
+const kProbeTimeoutMs = 40_000;
+const kApi = "VEXO.Camera";
+
+export class CameraSetup {
+  readonly #server: Server;
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  /** Counting footage takes the server half a second where there is much: leave it out of what is asked often. */
+  list({ footage }: { footage: boolean }): Promise<CameraSetupList> {
+    return this.#call("List", { footage });
+  }
+
+  /** Connects to a camera that need not be known yet. */
+  probe(request: ProbeRequest, signal: AbortSignal): Promise<ProbeResult | ProbeFailure> {
+    return this.#server.call(kApi, "Probe", {}, { json: request, signal, timeoutMs: kProbeTimeoutMs });
+  }
+
+  /** `codec` as a trial told it; empty: the recorder finds out. */
+  async add(settings: Omit<CameraSettings, "enabled">, password: string, codec: string): Promise<CameraRecord> {
+    const added = { ...settings, password, ...(codec ? { codec } : {}) };
+    return (await this.#call<{ camera: CameraRecord }>("Add", added)).camera;
+  }
+
+  /** Without `password` the stored one stays; empty: none. Rejects with status 409 and the record where `revision` is stale. */
+  async set(
+    id: number,
+    revision: number,
+    changes: Partial<CameraSettings> & { password?: string },
+  ): Promise<CameraRecord> {
+    return (await this.#call<{ camera: CameraRecord }>("Set", { id, revision, ...changes })).camera;
+  }
+
+  remove({ id, revision }: Pick<CameraRecord, "id" | "revision">, footage: "keep" | "remove"): Promise<unknown> {
+    return this.#call("Remove", { id, revision, footage });
+  }
+
+  /** Takes the ids of all cameras. */
+  order(id: number[]): Promise<unknown> {
+    return this.#call("Order", { id });
+  }
+
+  #call<Data>(method: string, json: unknown): Promise<Data> {
+    return this.#server.call<Data>(kApi, method, {}, { json });
+  }
+}

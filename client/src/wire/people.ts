@@ -1,0 +1,117 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Accounts, their rights and sessions. All but the change of the own password is for managers only.
+
+import type { Named } from "./camera_setup";
+import type { Server } from "./server";
+
+export const kPrivileges = ["viewer", "manager", "owner"] as const;
+export type Privilege = (typeof kPrivileges)[number];
+/** What a right to a camera can be denied for. */
+export const kCameraRights = ["live", "audio", "playback"] as const;
+export type CameraRight = (typeof kCameraRights)[number];
+
+/** Ids of what a viewer may not see. */
+export interface Denied extends Record<CameraRight, number[]> {
+  /** Of groups: what is denied holds for all of their cameras. */
+  group: Record<CameraRight, number[]>;
+  emap: number[];
+  door: number[];
+  ioModule: number[];
+}
+
+/** What a manager may change, apart from the password. */
+export interface UserSettings {
+  privilege: Privilege;
+  /** Whether it may report alarms and transactions. */
+  mayMark: boolean;
+  deny: Denied;
+}
+
+export interface UserRecord extends UserSettings {
+  id: number;
+  name: string;
+  revision: number;
+  /** Sessions that are open. */
+  sessions: number;
+  /** Unix seconds. */
+  lastUse: number | null;
+}
+
+export interface UserList {
+  user: UserRecord[];
+  camera: Named[];
+  group: (Named & { camera: number[] })[];
+  door: Named[];
+  ioModule: Named[];
+  emap: Named[];
+}
+
+export interface OpenSession {
+  /** Not the cookie. */
+  key: string;
+  /** Where it is used from. */
+  address: string;
+  /** Unix seconds. */
+  started: number;
+  lastUse: number;
+  /** The caller's own. */
+  current: boolean;
+}
+
+export interface SeenCamera extends Named, Record<CameraRight, boolean> {}
+
+const kApi = "VEXO.User";
+
+export class People {
+  readonly #server: Server;
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  list(): Promise<UserList> {
+    return this.#call("List", {});
+  }
+
+  /** `reauth` is the password of the manager who asks; a wrong one is rejected with status 403. */
+  async add(user: UserSettings & { name: string; password: string }, reauth: string): Promise<UserRecord> {
+    return (await this.#call<{ user: UserRecord }>("Add", { ...user, reauth })).user;
+  }
+
+  /** A new password or privilege needs `reauth`. Rejects with status 409 and the record where `revision` is stale. */
+  async set(
+    id: number,
+    revision: number,
+    changes: Partial<UserSettings> & { password?: string; reauth?: string },
+  ): Promise<UserRecord> {
+    return (await this.#call<{ user: UserRecord }>("Set", { id, revision, ...changes })).user;
+  }
+
+  remove({ id, revision }: Pick<UserRecord, "id" | "revision">, reauth: string): Promise<unknown> {
+    return this.#call("Remove", { id, revision, reauth });
+  }
+
+  async sessions(id: number): Promise<OpenSession[]> {
+    return (await this.#call<{ session: OpenSession[] }>("Sessions", { id })).session;
+  }
+
+  /** Without a key, all but the caller's own. Returns how many ended. */
+  async endSessions(id: number, key?: string): Promise<number> {
+    return (await this.#call<{ ended: number }>("EndSessions", key === undefined ? { id } : { id, key })).ended;
+  }
+
+  /** What this account sees. */
+  async preview(id: number): Promise<SeenCamera[]> {
+    return (await this.#call<{ camera: SeenCamera[] }>("Preview", { id })).camera;
+  }
+
+  /** Of the caller, who need not be a manager. A wrong password is rejected with status 403. */
+  changePassword(password: string, newPassword: string): Promise<unknown> {
+    return this.#call("ChangePassword", { password, newPassword });
+  }
+
+  #call<Data>(method: string, json: unknown): Promise<Data> {
+    return this.#server.call<Data>(kApi, method, {}, { json });
+  }
+}

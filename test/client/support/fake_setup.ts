@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Cameras, accounts and mounts that are set up, with revisions, and the password "right" of the manager.
+
+import type { CameraRecord } from "../../../client/src/wire/camera_setup";
+import type { MountRecord } from "../../../client/src/wire/mounts";
+import type { UserRecord } from "../../../client/src/wire/people";
+
+type Request = Record<string, never> & { id: number };
+type Answer = { status: number; success: boolean; data?: unknown; error?: unknown };
+export type SetupMethod = (request: Request) => Answer;
+
+const ok = (data: unknown): Answer => ({ status: 200, success: true, data });
+const failed = (code: number, message: string, data: unknown = null): Answer => ({
+  status: code,
+  success: false,
+  error: { code, message, data },
+});
+
+export class FakeSetup {
+  readonly camera: CameraRecord[] = [];
+  readonly user: UserRecord[] = [];
+  readonly mount: MountRecord[] = [];
+  /** All that was asked for but lists, with what it was asked with. */
+  readonly asked: [method: string, request: Record<string, unknown>][] = [];
+  /** The answer of a trial. */
+  probe: unknown = null;
+  /** What a new limit deletes. */
+  loss: unknown = null;
+
+  readonly methods: Record<string, SetupMethod> = {
+    "VEXO.Camera.List": () => ok({ camera: this.camera, group: [], mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
+    "VEXO.Camera.Probe": () => ok(this.probe),
+    "VEXO.Camera.Add": (request) => this.#note("Camera.Add", request, ok({ camera: { revision: 1, ...request } })),
+    "VEXO.Camera.Set": (request) => this.#set("camera", request),
+    "VEXO.Camera.Order": (request) => this.#note("Camera.Order", request, ok({})),
+    "VEXO.User.List": () => ok({ user: this.user, camera: this.camera, group: [{ id: 1, name: "Outside", camera: [2] }], door: [], ioModule: [], emap: [] }),
+    "VEXO.User.Set": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : this.#set("user", request)),
+    "VEXO.User.Sessions": () => ok({ session: [] }),
+    "VEXO.Mount.List": () => ok({ mount: this.mount }),
+    "VEXO.Mount.Set": (request) => (request.confirm ? this.#set("mount", request) : ok({ confirm: this.loss })),
+    "VEXO.System.Audit": () => ok({ entry: [], more: false }),
+  };
+
+  #set(kind: "camera" | "user" | "mount", request: Request): Answer {
+    const { id, revision, ...changes } = request;
+    const record = this[kind].find((one) => one.id === id)!;
+    if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
+    Object.assign(record, changes, { revision: record.revision + 1 });
+    return this.#note(kind, request, ok({ [kind]: record }));
+  }
+
+  #note(method: string, request: Request, answer: Answer): Answer {
+    this.asked.push([method, request]);
+    return answer;
+  }
+}
+
+export function cameraRecord(id: number, name: string): CameraRecord {
+  const plan = { mode: "always" as const, segment: 600, pre: 10, post: 30, mount: 0, profile: 0, hours: "1".repeat(168) };
+  const settings = { name, enabled: true, account: "", insecure: false, audio: false, ptz: false, liveProfile: 0, group: [], plan };
+  const seen = { codec: "h264", state: "connecting" as const, reason: "", recording: "", since: null, rate: 0, bytes: 0 };
+  const footage = { events: 0, bytes: 0, oldest: null };
+  return { id, revision: 1, order: id, hasPassword: true, source: [{ profile: 0, address: `rtsp://camera-${id}/a` }], footage, ...settings, ...seen };
+}

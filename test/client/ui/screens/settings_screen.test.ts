@@ -1,0 +1,171 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The settings in a real browser: nothing that was typed is lost, nobody's change is lost unseen, and nothing is deleted unasked.
+
+import type { Page } from "playwright-core";
+import { kNothingDenied } from "../../../../client/src/ui/settings/people/rights";
+import { cameraRecord } from "../../support/fake_setup";
+import { hasBrowser, ServedClient } from "../../support/served_client";
+
+describe.skipIf(!hasBrowser)("in Chromium", () => {
+  const client = new ServedClient();
+  const { setup } = client.server;
+
+  beforeEach(() => {
+    client.server.hasSession = client.server.isManager = true;
+    client.server.isAway = false;
+    setup.asked.length = 0;
+    setup.camera.splice(0, Infinity, cameraRecord(1, "Entrance"), cameraRecord(2, "Gate"));
+    const user = { revision: 1, mayMark: false, deny: kNothingDenied, sessions: 0, lastUse: null };
+    setup.user.splice(0, Infinity, { ...user, id: 1, name: "admin", privilege: "owner" }, { ...user, id: 2, name: "guard", privilege: "viewer" });
+  });
+
+  const open = (section: string) => client.open(`${client.address}#settings=${section}`, 1024, 768);
+  const save = (page: Page) => page.getByRole("button", { name: "Save", exact: true }).click();
+
+  test("who is no manager has no settings", async () => {
+    client.server.isManager = false;
+    const page = await open("people");
+    await page.getByText("Only managers").waitFor();
+    expect(await page.locator(".nav").textContent()).toBe("LiveEventsMaps");
+  });
+
+  test("a camera is added when its picture was seen; a trial can be given up, and fails with a reason", async () => {
+    const page = await open("cameras&open=new");
+    await page.getByLabel("Address", { exact: true }).fill("camera-3");
+    await page.getByLabel("Usual paths").selectOption({ index: 1 });
+    await page.getByLabel("The camera's password").fill("secret");
+    await page.route(/Probe/, () => undefined);
+    const tryIt = page.getByRole("button", { name: "Try this camera" });
+    await tryIt.click();
+    await page.getByRole("button", { name: "Cancel the trial" }).click();
+    await page.unroute(/Probe/);
+    setup.probe = { failed: "refused", message: "It refuses." };
+    await tryIt.click();
+    await page.getByText("It refuses.").waitFor();
+    const picture = client.server.jpeg.toString("base64");
+    setup.probe = { codec: "h264", width: 64, height: 36, rate: 25, audio: true, picture };
+    await tryIt.click();
+    await page.waitForFunction(() => document.querySelector<HTMLCanvasElement>(".probe-picture")?.width === 64);
+    await page.getByLabel("Name").fill("Yard");
+    await page.getByText("By the hour").click();
+    await page.getByText("Never", { exact: true }).last().click();
+    await page.locator(".plan-day", { hasText: "Su" }).click();
+    await page.getByRole("gridcell", { name: /^Monday, 00/ }).focus();
+    await page.keyboard.press("2");
+    await page.keyboard.press("Shift+ArrowRight");
+    const cell = (name: RegExp) => page.getByRole("gridcell", { name }).hover();
+    await cell(/^Tuesday, 04/);
+    await page.mouse.down();
+    await cell(/^Wednesday, 05/);
+    await page.mouse.up();
+    await page.getByRole("button", { name: "Add the camera" }).click();
+    await page.waitForURL(/#settings=cameras$/);
+    const [, added] = setup.asked[0]!;
+    const day = "1".repeat(24);
+    const night = `${"1".repeat(4)}00${"1".repeat(18)}`;
+    const hours = `00${"1".repeat(22)}${night}${night}${day.repeat(3)}${"0".repeat(24)}`;
+    expect(added).toMatchObject({ name: "Yard", password: "secret", audio: true, source: [{ profile: 0, address: "rtsp://camera-3/stream1" }] });
+    expect(added.plan).toMatchObject({ mode: "schedule", hours });
+  }, 40_000);
+
+  test("both changes are shown where someone else was faster, and the user chooses", async () => {
+    const page = await open("cameras&open=2");
+    await page.getByLabel("Name").fill("Gate north");
+    Object.assign(setup.camera[1]!, { revision: 7, name: "Gate south", audio: true });
+    await save(page);
+    const rows = page.locator(".form-conflict tbody tr");
+    await rows.first().waitFor();
+    expect(await rows.allInnerTexts()).toEqual(["Name\tGate north\tGate south", "Sound\tnot changed by you\tyes"]);
+    await page.getByRole("button", { name: "Save mine over theirs" }).click();
+    await page.getByText("The camera is saved.").waitFor();
+    expect(setup.asked, "their other change stays, and so does the password").toEqual([["camera", { id: 2, revision: 7, name: "Gate north" }]]);
+    await page.getByLabel("Name").fill("x");
+    Object.assign(setup.camera[1]!, { revision: 20, name: "Gate east" });
+    await save(page);
+    await page.getByRole("button", { name: "Drop mine" }).click();
+    expect(await page.getByLabel("Name").inputValue()).toBe("Gate east");
+  }, 20_000);
+
+  test("what was typed outlives a server that is away, a change of mind and the end of the session, but for passwords", async () => {
+    const page = await open("cameras&open=2");
+    await page.getByLabel("Name").fill("Gate north");
+    await page.getByLabel("The camera's password").fill("secret");
+    client.server.isAway = true;
+    await save(page);
+    await page.getByText("Not saved. The server does not answer.").waitFor();
+    client.server.isAway = false;
+    let asked = 0;
+    page.on("dialog", (dialog) => ((asked += 1), void dialog.dismiss()));
+    for (const leave of [
+      () => page.click(".settings-link >> nth=1"),
+      () => page.getByRole("button", { name: "Cancel" }).click(),
+      () => page.evaluate(() => location.reload()),
+    ]) {
+      await leave();
+      await vi.waitFor(() => expect(new URL(page.url()).hash).toBe("#settings=cameras&open=2"), 5000);
+    }
+    expect(asked).toBe(3);
+    client.server.hasSession = false;
+    await save(page);
+    await page.getByLabel("Account").fill("x");
+    await page.getByLabel("Password").fill("x");
+    await page.keyboard.press("Enter");
+    await page.getByText("Your changes from before").waitFor();
+    expect(await page.getByLabel("Name").inputValue()).toBe("Gate north");
+    expect(await page.getByLabel("The camera's password").inputValue()).toBe("");
+    await save(page);
+    await vi.waitFor(() => expect(setup.asked).toEqual([["camera", { id: 2, revision: 1, name: "Gate north" }]]));
+  }, 30_000);
+
+  test("the order of the cameras changes with keys and by dragging, and is stored once", async () => {
+    const page = await open("cameras");
+    await page.getByRole("button", { name: "Move Entrance" }).focus();
+    for (const key of ["ArrowDown", "ArrowUp", "ArrowDown"]) await page.keyboard.press(key);
+    await vi.waitFor(() => expect(setup.asked).toEqual([["Camera.Order", { id: [2, 1] }]]), 5000);
+    setup.camera.forEach((camera) => (camera.order = -camera.id));
+    await page.getByRole("button", { name: "Move Entrance" }).hover();
+    await page.mouse.down();
+    await page.locator("[data-camera='2'] canvas").hover({ force: true, position: { x: 5, y: 5 } });
+    await page.mouse.up();
+    await vi.waitFor(() => expect(setup.asked[1]).toEqual(["Camera.Order", { id: [1, 2] }]), 5000);
+  }, 20_000);
+
+  test("rights are stored as what is denied; a new password takes the manager's own", async () => {
+    const page = await open("people&open=2");
+    await page.getByLabel("All cameras: Sound").click();
+    await page.getByLabel("Entrance: Sound").click();
+    await page.getByLabel("Group Outside: Live").click();
+    await save(page);
+    const deny = { ...kNothingDenied, audio: [2], group: { ...kNothingDenied.group, live: [1] } };
+    await vi.waitFor(() => expect(setup.asked).toEqual([["user", { id: 2, revision: 1, deny }]]));
+    await page.getByLabel("New password").fill("long enough");
+    await page.getByLabel("The same once more").fill("long enough");
+    await save(page);
+    const dialog = page.getByRole("dialog", { name: "Change guard" });
+    for (const word of ["wrong", "right"]) {
+      await dialog.getByLabel("Your own password").fill(word);
+      await dialog.getByRole("button", { name: "Change" }).click();
+      if (word === "wrong") await dialog.getByText("The password is wrong.").waitFor();
+    }
+    await vi.waitFor(() => expect(setup.asked[1]).toEqual(["user", { id: 2, revision: 2, password: "long enough", reauth: "right" }]));
+    await vi.waitFor(async () => expect(await page.getByLabel("New password").inputValue()).toBe(""));
+  }, 20_000);
+
+  test("limits that delete footage are saved when the user has seen how much", async () => {
+    const mount = { id: 1, revision: 1, name: "Disk", path: "/srv", enabled: true, default: true, state: "ready", message: "", total: 9e11, free: 5e11, used: 4e11 };
+    setup.mount.splice(0, Infinity, { ...mount, oldest: null, limit: { bytes: null, days: null }, perDay: 1e10, lastsDays: null, history: [], camera: [] });
+    setup.loss = { events: 12, bytes: 3e9, until: 1_790_000_000 };
+    const page = await open("storage&open=1");
+    await page.getByLabel("Days").fill("30");
+    for (const answer of ["Cancel", "Save and delete"]) {
+      await save(page);
+      const dialog = page.getByRole("dialog", { name: "Delete footage?" });
+      await dialog.getByText("12 events with 3.0 GB").waitFor();
+      expect(setup.asked).toEqual([]);
+      await dialog.getByRole("button", { name: answer }).click();
+    }
+    await page.getByText("The mount is saved.").waitFor();
+    expect(setup.asked).toEqual([["mount", { id: 1, revision: 1, limitDays: 30, confirm: true }]]);
+  }, 20_000);
+});
