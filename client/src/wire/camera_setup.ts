@@ -20,7 +20,7 @@ export interface CameraSource {
 }
 
 export interface RecordingPlan {
-  /** "schedule" goes by `hours`. */
+  /** "never" but around alarms; "schedule" goes by `hours`. */
   mode: "never" | "always" | "schedule";
   /** Seconds; how long a file becomes. */
   segment: number;
@@ -30,7 +30,7 @@ export interface RecordingPlan {
   /** 0: the default mount. */
   mount: number;
   profile: number;
-  /** A character for each hour of the week, from Monday 00:00 on: 0 never, 1 always, 2 on alarm. */
+  /** A character for each hour of the server's week, from Monday 00:00 on: 0 never, 1 always, 2 on alarm. */
   hours: string;
 }
 

@@ -2,7 +2,6 @@
 //
 // Mounts: where recordings are kept, how much of it is used, and for how long it lasts. For managers only.
 
-import type { Named } from "./camera_setup";
 import type { Server } from "./server";
 
 /** What a manager may change. */
@@ -22,20 +21,22 @@ export interface MountRecord extends Omit<MountSettings, "limitBytes" | "limitDa
   state: string;
   /** What is wrong, as a sentence; may be empty. */
   message: string;
-  /** Bytes; `used` by recordings alone. */
-  total: number;
-  free: number;
+  /** Bytes of the disk; null where it does not say. */
+  total: number | null;
+  free: number | null;
+  /** Bytes of recordings. */
   used: number;
-  /** Unix seconds. */
+  /** Unix seconds; of what may be deleted. */
   oldest: number | null;
   limit: { bytes: number | null; days: number | null };
   /** Bytes a day over the last week. */
   perDay: number;
   /** For how many days there is room; null where nobody can say. */
   lastsDays: number | null;
-  /** Of the last 30 days. */
+  /** What is left of the last 30 days. */
   history: { day: string; bytes: number }[];
-  camera: (Named & { perDay: number })[];
+  /** One that was removed has no name. */
+  camera: { id: number; name?: string; perDay: number }[];
 }
 
 /** What a new limit would delete at once. */

@@ -34,13 +34,14 @@ export interface UserRecord extends UserSettings {
   revision: number;
   /** Sessions that are open. */
   sessions: number;
-  /** Unix seconds. */
+  /** Unix seconds; null without sessions. */
   lastUse: number | null;
 }
 
 export interface UserList {
   user: UserRecord[];
-  camera: Named[];
+  /** Those of a recording server have its name. */
+  camera: (Named & { server?: string })[];
   group: (Named & { camera: number[] })[];
   door: Named[];
   ioModule: Named[];
@@ -50,7 +51,7 @@ export interface UserList {
 export interface OpenSession {
   /** Not the cookie. */
   key: string;
-  /** Where it is used from. */
+  /** Where the log-in came from; may be empty. */
   address: string;
   /** Unix seconds. */
   started: number;

@@ -58,7 +58,7 @@ test("the audit log tells what differs, within settings as well", () => {
     { name: "group", before: "1", after: "1, 2" },
   ]);
   expect(changesOf({ before: null, after: { on: true } })).toEqual([{ name: "on", before: "", after: "yes" }]);
-  expect([actionText("camera.add"), actionText("user.end-sessions"), actionText("ioModule.rename")]).toEqual(["Camera added", "Account sessions ended", "Io module rename"]);
+  expect([actionText("camera.add"), actionText("user.endSessions"), actionText("ioModule.rename")]).toEqual(["Camera added", "Account sessions ended", "Io module rename"]);
 });
 
 test("amounts change their unit where four digits would be needed", () => {

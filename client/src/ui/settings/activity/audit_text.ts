@@ -12,8 +12,8 @@ const kVerbs: Record<string, string> = {
   set: "changed",
   remove: "removed",
   order: "put in order",
-  password: "password changed",
-  "end-sessions": "sessions ended",
+  changePassword: "password changed",
+  endSessions: "sessions ended",
 };
 
 /** "camera.add": "Camera added". */
@@ -54,6 +54,7 @@ function flat(state: AuditedState | null, prefix = ""): Map<string, string> {
 function textOf(value: unknown): string {
   if (typeof value === "boolean") return value ? "yes" : "no";
   if (value === null || value === undefined) return "";
-  if (!Array.isArray(value)) return typeof value === "object" ? JSON.stringify(value) : String(value);
-  return value.map(textOf).join(", ");
+  if (Array.isArray(value)) return value.map(textOf).join(", ");
+  if (typeof value !== "object") return String(value);
+  return Object.entries(value).map(([name, inner]) => `${name} ${textOf(inner)}`).join(" ");
 }

@@ -60,10 +60,9 @@ export function hourText(at: number): string {
 
 /** Without `mounts`, in few words. */
 export function planText(plan: RecordingPlan, mounts?: readonly { id: number; name: string }[]): string {
-  if (plan.mode === "never") return "never";
-  const when = plan.mode === "always" ? "always" : weekText(plan.hours);
+  const when = { never: "on alarm only", always: "always", schedule: weekText(plan.hours) }[plan.mode];
   if (!mounts) return when;
-  const hasAlarms = plan.mode === "schedule" && plan.hours.includes("2");
+  const hasAlarms = plan.mode === "never" || (plan.mode === "schedule" && plan.hours.includes("2"));
   const alarms = hasAlarms ? `, ${plan.pre} s before and ${plan.post} s after an alarm` : "";
   const mount = mounts.find(({ id }) => id === plan.mount)?.name ?? "the default mount";
   return `${when}${alarms}, files of ${duration(plan.segment)}, on ${mount}`;

@@ -16,7 +16,7 @@ export class PlanField implements Field<RecordingPlan> {
   readonly #mode = radioField<RecordingPlan["mode"]>("Record", [
     ["always", "Always"],
     ["schedule", "By the hour"],
-    ["never", "Never"],
+    ["never", "On alarm only"],
   ]);
   readonly #grid = new PlanGrid();
   readonly #pre = numberField("Seconds before an alarm", 0, 300);
@@ -27,15 +27,14 @@ export class PlanField implements Field<RecordingPlan> {
     kProfiles.map((name, profile) => [String(profile), name] as const),
   );
   readonly #mount: Field<string>;
-  readonly #details: HTMLElement;
   readonly #alarm: HTMLElement;
 
   constructor(mounts: CameraSetupList["mount"]) {
     const names = mounts.map(({ id, name }) => [String(id), name] as const);
     this.#mount = selectField("Kept on", [["0", "The default mount"], ...names]);
     this.#alarm = formRow(this.#pre, this.#post);
-    this.#details = formRow(this.#segment, this.#profile, this.#mount);
-    this.root.append(this.#mode.root, this.#grid.root, this.#alarm, this.#details);
+    const files = formRow(this.#segment, this.#profile, this.#mount);
+    this.root.append(this.#mode.root, this.#grid.root, this.#alarm, files);
     this.root.addEventListener("input", () => this.#adapt());
     this.value = kFirstPlan;
   }
@@ -67,7 +66,6 @@ export class PlanField implements Field<RecordingPlan> {
   #adapt(): void {
     const mode = this.#mode.value;
     this.#grid.root.hidden = mode !== "schedule";
-    this.#alarm.hidden = mode !== "schedule" || !this.#grid.value.includes("2");
-    this.#details.hidden = mode === "never";
+    this.#alarm.hidden = mode === "always" || (mode === "schedule" && !this.#grid.value.includes("2"));
   }
 }

@@ -29,7 +29,7 @@ export class PeoplePage extends LoadedPage<UserList> {
   #row(user: UserRecord, list: UserList): HTMLElement {
     const { id, name, privilege, sessions, lastUse, deny, mayMark } = user;
     const isOwn = id === this.context.account.user_id;
-    const used = lastUse ? `last used ${minuteText(lastUse * 1000)}` : "never used";
+    const used = lastUse ? `last used ${minuteText(lastUse * 1000)}` : "";
     const marks = mayMark && privilege === "viewer" ? ", reports alarms" : "";
     const part = (look: string, ...texts: string[]) =>
       element("div", { class: look }, ...texts.map((text) => element("span", {}, text)));

@@ -21,6 +21,9 @@ import { kNothingDenied, kPrivilegeNames, rightsText, userSettingsOf } from "./r
 import { RightsMatrix } from "./rights_matrix";
 import { SessionsPanel } from "./sessions_panel";
 
+/** Whoever changed it here would end the own session. */
+const kOwnHint = "Change your own password with the button with the person in the bar.";
+
 type Settings = UserSettings & { name: string };
 
 const kFirstSettings: Settings = { name: "", privilege: "viewer", mayMark: false, deny: kNothingDenied };
@@ -63,10 +66,14 @@ export class PersonPage extends LoadedPage<UserList> {
       ["manager", "Watch and set up (manager)"],
       ["owner", "Everything (owner)"],
     ]);
-    const mayMark = checkField("Report alarms and transactions", "For devices and tills. Managers always may.");
+    const mayMark = checkField("Report alarms and transactions", "For devices and tills.");
     const rights = new RightsMatrix(list);
     name.root.hidden = user !== null;
-    const account = formPart("Account", name.root, formRow(password, again), privilege.root, mayMark.root);
+    const isOwn = user?.id === this.context.account.user_id;
+    const passwords = isOwn ? element("p", { class: "form-hint" }, kOwnHint) : formRow(password, again);
+    const account = formPart("Account", name.root, passwords, privilege.root, mayMark.root);
+    const adapt = () => (mayMark.root.hidden = privilege.value !== "viewer");
+    account.addEventListener("input", adapt);
     const settingsOf = (stored: UserRecord) => ({ name: stored.name, ...userSettingsOf(stored) });
     this.#form = new RecordForm<Settings, UserRecord>(
       {
@@ -80,6 +87,7 @@ export class PersonPage extends LoadedPage<UserList> {
           privilege.value = settings.privilege;
           mayMark.value = settings.mayMark;
           rights.value = settings.deny;
+          adapt();
         },
         hasSecrets: () => password.value !== "" || again.value !== "",
         problem: (settings) => this.#problem(settings, password, again),
@@ -112,7 +120,6 @@ export class PersonPage extends LoadedPage<UserList> {
     const preview = button("See as this account", showIt, "plain");
     const sessions = formPart("Sessions", new SessionsPanel(this.#people, user.id).root);
     const remove = button("Remove this account…", () => void this.#remove(), "plain");
-    const isOwn = user.id === this.context.account.user_id;
     this.show(preview, this.#form.root, sessions, ...(isOwn ? [] : [formPart("Remove", remove)]));
   }
 

@@ -34,7 +34,8 @@ export class RightsMatrix implements Field<Denied> {
     this.#all = this.#boxes((right) => `All cameras: ${kRightNames[right]}`);
     const rows = (kind: Row["kind"], items: readonly { id: number; name: string }[]) =>
       items.map(({ id, name }) => this.#row(kind, id, name));
-    this.#rows = [...rows("group", list.group), ...rows("camera", list.camera)];
+    const cameras = list.camera.map(({ id, name, server }) => ({ id, name: server ? `${name} (${server})` : name }));
+    this.#rows = [...rows("group", list.group), ...rows("camera", cameras)];
     this.#others = {
       emap: chipsField("Maps", list.emap),
       door: chipsField("Doors", list.door),

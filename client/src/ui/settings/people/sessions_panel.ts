@@ -36,7 +36,8 @@ export class SessionsPanel {
   #show(sessions: readonly OpenSession[]): void {
     const none = element("p", { class: "quiet" }, "Nobody is logged in with this account.");
     if (sessions.length === 0) return this.root.replaceChildren(none);
-    const rows = sessions.map(({ key, address, started, lastUse, current }) => {
+    const rows = sessions.map(({ key, address: from, started, lastUse, current }) => {
+      const address = from || "unknown";
       const end = button("End", () => void this.#end(`The session from ${address} is ended.`, key));
       end.setAttribute("aria-label", `End the session from ${address}`);
       const last = current ? element("span", {}, "this session") : end;

@@ -14,7 +14,7 @@ import { historyPlot } from "./history_plot";
 import { forecastText, limitText, stateText } from "./storage_text";
 
 export function mountCard(mount: MountRecord): HTMLElement {
-  const { id, name, path, enabled, state, message } = mount;
+  const { id, name, path, enabled, state, message, total, free } = mount;
   const isWell = state === "ready";
   const marks = [mount.default ? "default" : "", stateText(mount)].filter((text) => text).join(" · ");
   const head = element(
@@ -33,7 +33,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
     "dl",
     { class: "mount-facts" },
     fact("Recordings", bytesText(mount.used)),
-    fact("Free", `${bytesText(mount.free)} of ${bytesText(mount.total)}`),
+    fact("Free", total === null || free === null ? "unknown" : `${bytesText(free)} of ${bytesText(total)}`),
     fact("Oldest footage", oldest),
     fact("A day", bytesText(mount.perDay)),
     fact("Limits", limitText(mount.limit)),
@@ -44,7 +44,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
     head,
     element("p", { class: "quiet mount-path" }, path),
     ...trouble,
-    ...(mount.total > 0 ? [usageBar(mount)] : []),
+    ...(total === null || free === null ? [] : [usageBar(total, free, mount.used)]),
     element("p", { class: "mount-forecast" }, forecastText(mount.lastsDays)),
     facts,
     historyPlot(mount.history),
@@ -52,7 +52,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
   );
 }
 
-function usageBar({ total, free, used }: MountRecord): HTMLElement {
+function usageBar(total: number, free: number, used: number): HTMLElement {
   const whole = Math.max(total, 1);
   const other = Math.max(0, total - free - used);
   const rect = (look: string, from: number, bytes: number) =>
@@ -72,7 +72,7 @@ function usageBar({ total, free, used }: MountRecord): HTMLElement {
 function cameras({ camera }: MountRecord): HTMLElement[] {
   if (camera.length === 0) return [];
   const most = [...camera].sort((one, other) => other.perDay - one.perDay);
-  const rows = most.map(({ name, perDay }) => {
+  const rows = most.map(({ name = "a removed camera", perDay }) => {
     const need = element("td", {}, `${bytesText(perDay)} a day`);
     return element("tr", {}, element("th", { scope: "row" }, name), need);
   });

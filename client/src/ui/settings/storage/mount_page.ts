@@ -53,13 +53,15 @@ export class MountPage extends LoadedPage<MountRecord[]> {
   #showForm(): void {
     const mount = this.#mount;
     const name = textField("Name", { maxlength: "80" });
-    const where = mount ? "" : "On a disk of the server, and empty.";
-    const path = textField("Folder", { readonly: mount !== null, placeholder: "/srv/recordings" }, where);
-    const enabled = checkField("Switched on", "Off, nothing is recorded there; what it has can be watched.");
+    const where = "An empty folder of the server, below one of those that its operator allows: at first /mnt, /media and /srv.";
+    const path = textField("Folder", { readonly: mount !== null, placeholder: "/srv/recordings" }, mount ? "" : where);
+    const enabled = checkField("Record to it", "If not, what it has can still be watched.");
     const isDefault = checkField("The default mount", "For cameras that name no other.");
     const [days, gigabytes] = [numberField("Days", 1, 36_500), numberField("Size in GB", 0.1, 10_000_000)];
     const effect = element("p", { class: "form-hint", "aria-live": "polite" });
     enabled.root.hidden = mount === null;
+    // Another one is made the default instead.
+    isDefault.root.hidden = mount?.default ?? false;
     const hint = "What is older or more is deleted, the oldest first. Empty: no limit but the disk.";
     const limits = formPart("Limits", element("p", { class: "form-hint" }, hint), formRow(days, gigabytes), effect);
     const read = (): Settings => ({
@@ -97,7 +99,7 @@ export class MountPage extends LoadedPage<MountRecord[]> {
         describe: {
           name: ["Name", String],
           path: ["Folder", String],
-          enabled: ["Switched on", yesNo],
+          enabled: ["Recorded to", yesNo],
           default: ["Default", yesNo],
           limitBytes: ["At most", (value) => (value === null ? "no limit" : bytesText(value))],
           limitDays: ["Days", (value) => (value === null ? "no limit" : String(value))],

@@ -8,13 +8,17 @@ import { bytesText, counted, daysText } from "../../widgets/amounts";
 const kStates: Record<string, string> = {
   ready: "ready",
   "read-only": "read only",
+  "no-access": "not accessible",
   full: "full",
-  absent: "not there",
-  foreign: "of another installation",
+  failing: "failing",
+  "in-use": "in use by another recorder",
+  "space-held": "its space is held",
+  absent: "not mounted",
+  foreign: "another mount's",
 };
 
 export function stateText({ enabled, state }: Pick<MountRecord, "enabled" | "state">): string {
-  return enabled ? (kStates[state] ?? state) : "switched off";
+  return enabled ? (kStates[state] ?? state) : "not recorded to";
 }
 
 /** "keeps 30 days, at most 500 GB", "keeps as much as there is room for". */
@@ -34,7 +38,8 @@ export function limitsEffect(
   { perDay, used, free }: Pick<MountRecord, "perDay" | "free" | "used">,
 ): string {
   if (perDay <= 0) return "";
-  const room = Math.min(limitBytes ?? Infinity, used + free);
+  const room = Math.min(limitBytes ?? Infinity, free === null ? Infinity : used + free);
   const days = Math.min(limitDays ?? Infinity, room / perDay);
+  if (days === Infinity) return "";
   return `At ${bytesText(perDay)} a day there will be about ${daysText(days)} of footage, ${bytesText(days * perDay)}.`;
 }
