@@ -71,7 +71,7 @@ export class AccountMenu {
   }
 
   async #changePassword(): Promise<void> {
-    const password = secretField("Your password until now", "", "current-password");
+    const password = secretField("Your password until now");
     const wanted = secretField("New password", "At least eight characters.");
     const again = secretField("New password once more");
     const isDone = await openDialog(this.root.parentElement!, {

@@ -44,9 +44,9 @@ export function textField(label: string, attributes: Record<string, string | boo
   };
 }
 
-/** For a password that is chosen, which browsers shall not fill in; `autocomplete` otherwise. */
-export function secretField(label: string, hint = "", autocomplete = "new-password"): TextField {
-  return textField(label, { type: "password", autocomplete, maxlength: "1024" }, hint);
+/** For a password. Browsers fill in none: who is at the page need not be who has logged in. */
+export function secretField(label: string, hint = ""): TextField {
+  return textField(label, { type: "password", autocomplete: "new-password", maxlength: "1024" }, hint);
 }
 
 /** Null where nothing is typed. */

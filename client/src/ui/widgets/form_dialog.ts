@@ -71,7 +71,7 @@ export function openReauthDialog(
   host: HTMLElement,
   form: Omit<DialogForm, "attempt"> & { attempt(password: string): Promise<void> },
 ): Promise<boolean> {
-  const password = secretField("Your own password", "", "current-password");
+  const password = secretField("Your own password");
   return openDialog(host, {
     ...form,
     content: [...form.content, password.root],

@@ -15,9 +15,9 @@ export const kHourModes = ["never", "always", "on alarm"] as const;
 /** As new cameras have it. */
 export const kFirstPlan: RecordingPlan = {
   mode: "always",
-  segment: 600,
-  pre: 10,
-  post: 30,
+  segment: 300,
+  pre: 5,
+  post: 10,
   mount: 0,
   profile: 0,
   hours: "1".repeat(kHoursOfWeek),

@@ -20,8 +20,8 @@ export class PlanField implements Field<RecordingPlan> {
   ]);
   readonly #grid = new PlanGrid();
   readonly #pre = numberField("Seconds before an alarm", 0, 300);
-  readonly #post = numberField("Seconds after an alarm", 0, 3600);
-  readonly #segment = numberField("Minutes in one file", 0.1, 720);
+  readonly #post = numberField("Seconds after an alarm", 0, 300);
+  readonly #segment = numberField("Minutes in one file", 0.16, 60);
   readonly #profile = selectField(
     "Recorded stream",
     kProfiles.map((name, profile) => [String(profile), name] as const),

@@ -61,10 +61,11 @@ export class PersonPage extends LoadedPage<UserList> {
     const hint = user ? "Left empty, it stays. A new one ends all sessions of this account." : "At least eight characters.";
     const password = secretField(user ? "New password" : "Password", hint);
     const again = secretField("The same once more");
-    const privilege = radioField("May", [
+    const mayMakeOwners = list.user.some((one) => one.id === this.context.account.user_id && one.privilege === "owner");
+    const privilege = radioField<UserSettings["privilege"]>("May", [
       ["viewer", "Watch"],
       ["manager", "Watch and set up (manager)"],
-      ["owner", "Everything (owner)"],
+      ...(mayMakeOwners || user?.privilege === "owner" ? [["owner", "Everything (owner)"] as const] : []),
     ]);
     const mayMark = checkField("Report alarms and transactions", "For devices and tills.");
     const rights = new RightsMatrix(list);
