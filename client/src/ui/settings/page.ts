@@ -52,8 +52,9 @@ export abstract class LoadedPage<Data> implements Page {
     return false;
   }
 
+  /** Until the page is filled, what it was opened with. */
   get draft(): Draft | null {
-    return null;
+    return this.context.draft;
   }
 
   /** Ends requests and timers. */

@@ -99,7 +99,10 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
     try {
       const stored = await this.#parts.save(settings, this.#base);
       if (!stored) return;
+      const typed = this.#parts.read();
       this.#take(stored);
+      // The server may have been slow.
+      if (!isSame(typed, settings)) this.#parts.show(merged(settings, typed, this.#initial));
       this.#parts.onSaved(stored);
     } catch (error) {
       const { status, data, message } = asServerError(error);

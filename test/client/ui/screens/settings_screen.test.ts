@@ -72,6 +72,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   test("both changes are shown where someone else was faster, and the user chooses", async () => {
     const page = await open("cameras&open=2");
     await page.getByLabel("Name").fill("Gate north");
+    expect(await page.evaluate(() => document.documentElement.scrollHeight), "the page scrolls, not the document").toBe(768);
     Object.assign(setup.camera[1]!, { revision: 7, name: "Gate south", audio: true });
     await save(page);
     const rows = page.locator(".form-conflict tbody tr");
@@ -114,8 +115,12 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.getByText("Your changes from before").waitFor();
     expect(await page.getByLabel("Name").inputValue()).toBe("Gate north");
     expect(await page.getByLabel("The camera's password").inputValue()).toBe("");
+    const typeOn = () => page.getByLabel("Name").fill("Gate north 2");
+    await page.route(/method=Set/, (route) => typeOn().then(() => route.continue()), { times: 1 });
     await save(page);
-    await vi.waitFor(() => expect(setup.asked).toEqual([["camera", { id: 2, revision: 1, name: "Gate north" }]]));
+    await page.getByText("The camera is saved.").waitFor();
+    expect(setup.asked).toEqual([["camera", { id: 2, revision: 1, name: "Gate north" }]]);
+    expect(await page.getByLabel("Name").inputValue(), "typed while it was being saved").toBe("Gate north 2");
   }, 30_000);
 
   test("the order of the cameras changes with keys and by dragging, and is stored once", async () => {

@@ -79,7 +79,7 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
   }
 
   override get draft(): Draft | null {
-    return this.#form?.draft ?? null;
+    return this.#form ? this.#form.draft : super.draft;
   }
 
   override close(): void {

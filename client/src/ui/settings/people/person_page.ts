@@ -52,7 +52,7 @@ export class PersonPage extends LoadedPage<UserList> {
   }
 
   override get draft(): Draft | null {
-    return this.#form?.draft ?? null;
+    return this.#form ? this.#form.draft : super.draft;
   }
 
   #showForm(list: UserList): void {

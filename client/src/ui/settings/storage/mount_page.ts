@@ -47,7 +47,7 @@ export class MountPage extends LoadedPage<MountRecord[]> {
   }
 
   override get draft(): Draft | null {
-    return this.#form?.draft ?? null;
+    return this.#form ? this.#form.draft : super.draft;
   }
 
   #showForm(): void {
