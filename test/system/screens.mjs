@@ -58,4 +58,17 @@ await visit(async (page, complaints) => {
   await page.keyboard.press("e");
   await page.locator(".map-editor .map-item").first().click();
   await look("editor", ".map-form");
+  for (const [name, hash, selector] of [
+    ["cameras", "cameras", ".camera-row"],
+    ["camera", "cameras&open=1", ".form"],
+    ["new-camera", "cameras&open=new", ".form"],
+    ["people", "people", ".person-row"],
+    ["person", "people&open=2", ".rights"],
+    ["storage", "storage", ".mount-card"],
+    ["mount", "storage&open=1", ".form"],
+    ["activity", "activity", ".activity-entry, .settings-state"],
+  ]) {
+    await go(`#settings=${hash}`);
+    await look(name, selector);
+  }
 });

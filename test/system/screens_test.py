@@ -25,6 +25,14 @@ class ScreensTest(unittest.TestCase):
                 ("filter", "Events", None),
                 ("map", "Ground floor", "Maps"),
                 ("editor", "Ground floor", None),
+                ("cameras", "Cameras", "Settings"),
+                ("camera", "Cameras", None),
+                ("new-camera", "Cameras", None),
+                ("people", "People", "People"),
+                ("person", "People", None),
+                ("storage", "Storage", "Storage"),
+                ("mount", "Storage", None),
+                ("activity", "Activity", "Activity"),
             ]:
                 seen = visit.see(name)
                 with self.subTest(name):

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One visit that sets up without a shell: a camera of the network with its picture first and a plan, and an account that sees
+// it alone, without its sound. CAMERA is the camera's address.
+import { address, folder, logIn, password, report, visit } from "./chromium.mjs";
+
+const kWord = "a long night";
+
+await visit(async (page, complaints) => {
+  await page.goto(`${address}#settings=cameras`);
+  await logIn(page);
+  await page.getByRole("link", { name: "Add a camera" }).click();
+  await page.getByLabel("Address", { exact: true }).fill(process.env.CAMERA);
+  await page.getByRole("button", { name: "Try this camera" }).click();
+  await page.locator(".probe-picture").waitFor({ timeout: 30_000 });
+  await page.screenshot({ path: `${folder}/tried.png` });
+  await report("tried", {
+    facts: await page.locator(".probe-facts").textContent(),
+    size: await page.locator(".probe-picture").evaluate(({ width, height }) => [width, height]),
+  });
+
+  await page.getByLabel("Name").fill("Loading bay");
+  await page.getByText("By the hour").click();
+  for (const [mode, days] of [["Never", ["Mo", "Tu", "We", "Th", "Fr"]], ["On alarm", ["Sa", "Su"]]]) {
+    await page.locator(".plan").getByText(mode, { exact: true }).click();
+    for (const day of days) await page.locator(".plan-day", { hasText: day }).click();
+  }
+  await page.getByLabel("Seconds before an alarm").fill("7");
+  await page.getByRole("button", { name: "Add the camera" }).click();
+  await page.locator(".camera-row", { hasText: "Loading bay" }).waitFor();
+  await page.evaluate(() => void (location.hash = "#"));
+  await page.locator('.tile[data-state="live"]', { hasText: "Loading bay" }).waitFor({ timeout: 20_000 });
+  await report("on the wall");
+
+  await page.evaluate(() => void (location.hash = "#settings=people&open=new"));
+  await page.getByLabel("Name").fill("night");
+  await page.getByLabel("Password", { exact: true }).fill(kWord);
+  await page.getByLabel("The same once more").fill(kWord);
+  for (const right of ["Live", "Sound", "Playback"]) await page.getByLabel(`All cameras: ${right}`).click();
+  for (const right of ["Live", "Playback"]) await page.getByLabel(`Loading bay: ${right}`).check();
+  await page.getByRole("button", { name: "Add the account" }).click();
+  await page.getByLabel("Your own password").fill(password);
+  await page.getByRole("button", { name: "Add", exact: true }).click();
+  await page.locator(".person-row", { hasText: "night" }).waitFor();
+  await page.screenshot({ path: `${folder}/people.png` });
+  await report("account", { word: kWord, row: await page.locator(".person-row", { hasText: "night" }).innerText() });
+
+  await page.evaluate(() => void (location.hash = "#settings=activity"));
+  await page.locator(".activity-entry").first().waitFor();
+  await report("activity", { entries: await page.locator(".activity-what").allInnerTexts() });
+
+  await page.getByRole("button", { name: "Account admin" }).click();
+  await page.getByRole("button", { name: "Log out" }).click();
+  await page.locator(".login-form").waitFor();
+  await page.getByLabel("Account", { exact: true }).fill("night");
+  await page.getByLabel("Password").fill(kWord);
+  await page.getByRole("button", { name: "Log in" }).click();
+  await page.evaluate(() => void (location.hash = "#"));
+  await page.locator('.tile[data-state="live"]').waitFor({ timeout: 20_000 });
+  await report("night", {
+    tiles: await page.locator(".tile").count(),
+    links: await page.locator(".nav-link").allInnerTexts(),
+    complaints,
+  });
+});

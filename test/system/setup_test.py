@@ -1,0 +1,57 @@
+# SPDX-License-Identifier: Apache-2.0
+#
+# Set up in the browser, without a shell: a camera of the network with a plan, and an account that sees it alone and unheard.
+import json
+import subprocess
+import unittest
+
+from installation import BUILD, LIVE, PLAYER, Installation, Parts, call
+from visit import Visit
+
+CAMERA = BUILD / "bin/rtsp-camera"
+
+
+class SetupTest(unittest.TestCase):
+    def kinds(self, server, camera, session):
+        """The content types of two seconds of live parts."""
+        query = call(LIVE, "Play", camera=camera)
+        with Parts(*server.open(query, headers={"Cookie": f"id={session}"})) as stream:
+            return {stream.next()[0]["content-type"].partition("/")[0] for _ in range(60)}
+
+    @unittest.skipUnless(CAMERA.exists(), "the simulated camera is not built")
+    def test_a_camera_a_plan_and_an_account(self):
+        server = self.enterContext(Installation())
+        simulated = self.enterContext(subprocess.Popen([CAMERA, "0"], stdout=subprocess.PIPE, text=True))
+        self.addCleanup(simulated.kill)
+        source = f"rtsp://127.0.0.1:{int(simulated.stdout.readline())}/live"
+        with Visit("setup.mjs", f"http://127.0.0.1:{server.port}/", CAMERA=source) as visit:
+            tried = visit.see("tried")
+            self.assertEqual(tried["size"], [320, 240])
+            self.assertEqual(tried["facts"], "H.264 · 320 × 240 · 25 pictures a second · with sound")
+            visit.see("on the wall")
+            headers = {"Content-Type": "application/json"}
+            answer = server.request(call("VEXO.Camera", "List"), "admin", body="{}", headers=headers)
+            camera = answer.json["data"]["camera"][-1]
+            plan = camera["plan"]
+            self.assertEqual((camera["name"], camera["source"][0]["address"]), ("Loading bay", source))
+            self.assertEqual((plan["mode"], plan["pre"], plan["hours"]), ("schedule", 7, "0" * 120 + "2" * 48))
+            account = visit.see("account")
+            self.assertIn("sees 1 of", account["row"])
+            self.assertIn("without sound", account["row"])
+            session = server.login("night", account["word"])
+            listed = server.request(call(PLAYER, "LoadCamera"), headers={"Cookie": f"id={session}"})
+            self.assertEqual([one["name"] for one in listed.json["data"]["camera"]], ["Loading bay"])
+            self.assertEqual(self.kinds(server, camera["id"], session), {"image"})
+            self.assertEqual(self.kinds(server, camera["id"], server.session("admin")), {"image", "audio"})
+            wanted = ["Account added: night (", "Camera added: Loading bay ("]
+            entries = visit.see("activity")["entries"]
+            self.assertEqual([entry[: len(text)] for entry, text in zip(entries, wanted)], wanted)
+            self.assertNotIn(account["word"], json.dumps(server.request(
+                call("VEXO.System", "Audit"), "admin", body="{}", headers=headers).json))
+            night = visit.see("night")
+            self.assertEqual((night["tiles"], night["complaints"]), (1, []))
+            self.assertEqual(night["links"], ["Live", "Events", "Maps"])
+
+
+if __name__ == "__main__":
+    unittest.main()
