@@ -34,6 +34,7 @@ import "./style/picture.css";
 import "./style/wall.css";
 import "./style/large.css";
 import "./style/snapshot.css";
+import "./style/dialog.css";
 import "./style/events.css";
 import "./style/calendar.css";
 import "./style/event_filter.css";

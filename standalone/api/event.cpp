@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Event: report what happened at a camera, list it, walk through it, download its footage.
+// VEXO.Event: report what happened at a camera, list it, walk through it, keep it, download its footage.
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
@@ -9,7 +9,9 @@
 #include "platform/camera/camgroup.h"
 #include "platform/recording/eventsearch.h"
 #include "standalone/api/download.h"
+#include "standalone/api/event_json.h"
 #include "standalone/api/footage.h"
+#include "standalone/api/keep.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
@@ -39,57 +41,17 @@ std::string TextOf(const Json::Value& text) {
     return joined;
 }
 
-Json::Value LinesOf(const std::string& text) {
-    Json::Value lines(Json::arrayValue);
-    for (std::size_t at = 0; at < text.size();) {
-        const std::size_t end = std::min(text.find('\n', at), text.size());
-        lines.append(text.substr(at, end - at));
-        at = end + 1;
-    }
-    return lines;
-}
-
-Json::Value Describe(const store::Mark& mark) {
-    Json::Value json;
-    json["id"] = mark.id;
-    json["kind"] = mark.kind == store::MarkKind::kAlert ? "alert" : "pos";
-    json["camera_id"] = mark.camera_id;
-    json["time"] = Json::Int64{mark.moment_s};
-    json["start"] = Json::Int64{mark.start_s};
-    json["stop"] = Json::Int64{mark.end_s};
-    json["state"] = store::NameOf(mark.state);
-    json["reported_by"] = mark.reporter.name;
-    json["text"] = LinesOf(mark.text);
-    return json;
-}
-
-// With the same member names as the search of recorded events.
-Json::Value Describe(const store::Event& event) {
-    Json::Value json;
-    json["id"] = event.id;
-    json["kind"] = "event";
-    json["camera_id"] = event.camera_id;
-    json["start"] = Json::Int64{event.start_s};
-    json["stop"] = Json::Int64{event.end_s};
-    json["frame_count"] = event.frame_count;
-    json["record_type"] = event.reason;
-    json["is_recording"] = event.recording;
-    return json;
-}
-
 template <typename AnyEvent>
-std::string AnswerVisible(const std::optional<AnyEvent>& event) {
-    if (!event || !binding::MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
-        throw Failure(404, "there is no such event");
-    }
-    return SuccessAnswer(Describe(*event));
+std::string AnswerVisible(const Call& call, const std::optional<AnyEvent>& event) {
+    RequireVisible(event);
+    return SuccessAnswer(DescribeWithKeeping(call.Records(), *event));
 }
 
 std::string Get(const Call& call) {
     const std::optional<store::MarkKind> kind = KindOf(call);
     const int id = call.Parameter("event").asInt();
-    return kind ? AnswerVisible(store::Marks(call.Records()).Find(*kind, id))
-                : AnswerVisible(store::Events(call.Records()).Find(id));
+    return kind ? AnswerVisible(call, store::Marks(call.Records()).Find(*kind, id))
+                : AnswerVisible(call, store::Events(call.Records()).Find(id));
 }
 
 // The caller, who may report.
@@ -160,10 +122,11 @@ std::set<int> CamerasOf(const Call& call) {
     return ids;
 }
 
-std::string List(const Call& call) {
-    store::MarkFilter filter;
+// What the filters of marks and of recorded events have in common.
+template <typename Filter>
+Filter FilterOf(const Call& call) {
+    Filter filter;
     filter.camera_ids = CamerasOf(call);
-    filter.kind = KindOf(call);
     filter.begin_s = call.NumberOr("from", 0);
     filter.end_s = call.NumberOr("to", base::WallSeconds() + kMaxAheadSeconds);
     filter.newest_first = true;
@@ -174,8 +137,23 @@ std::string List(const Call& call) {
     }
     filter.offset = static_cast<int>(offset);
     filter.limit = static_cast<int>(limit);
+    return filter;
+}
+
+std::string List(const Call& call) {
     Json::Value data;
     data["event"] = Json::arrayValue;
+    const Json::Value& kept = call.Parameter("kept");
+    if (!kept.isNull() && kept.asBool()) {
+        auto filter = FilterOf<store::EventFilter>(call);
+        filter.kept_only = true;
+        for (const store::Event& event : store::Events(call.Records()).List(filter)) {
+            data["event"].append(DescribeWithKeeping(call.Records(), event));
+        }
+        return SuccessAnswer(data);
+    }
+    auto filter = FilterOf<store::MarkFilter>(call);
+    filter.kind = KindOf(call);
     for (const store::Mark& mark : store::Marks(call.Records()).List(filter)) {
         data["event"].append(Describe(mark));
     }
@@ -251,6 +229,7 @@ constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Effect::kChanges},
                                {"Get", Get},
                                {"Next", Next},
                                {"Frame", TellFrame},
+                               {"Keep", Keep, Method::Effect::kChanges},
                                {"Download", Download}};
 
 }  // namespace

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven event: lists, shows, marks and exports what was recorded.
+// lookhaven event: lists, shows, keeps, marks and exports what was recorded.
 #include <filesystem>
 #include <optional>
 #include <set>
@@ -17,6 +17,7 @@
 #include "standalone/media/remux.h"
 #include "standalone/media/source.h"
 #include "standalone/store/groups.h"
+#include "standalone/store/kept_events.h"
 #include "standalone/store/mounts.h"
 
 namespace lookhaven::cli {
@@ -38,7 +39,8 @@ struct Request {
     int id = 0;
     std::string file;
     bool no_sound = false;
-    bool undo = false;
+    std::string note;
+    bool kept = false;
     std::vector<int> cameras;
     int camera = 0;
     int group = 0;
@@ -88,6 +90,7 @@ Json::Value FindEvents(store::Store& store, const Request& request) {
     filter.mount_id = request.mount;
     filter.reason = request.reason;
     filter.finished_only = request.finished;
+    filter.kept_only = request.kept;
     return Array(Events(store).List(filter), [](const Event& event) { return ToData(event); });
 }
 
@@ -140,19 +143,42 @@ void Show(const Console& console, const Request& request) {
     data["file"] = file.string();
     data["file_readable"] = exists;
     std::string text = found.event ? Description(*found.event) : Description(*found.mark);
+    if (const auto keeping = store::KeptEvents(store).Find(request.id)) {
+        data["note"] = keeping->note;
+        data["kept_by"] = keeping->keeper;
+        data["kept"] = Json::Int64{keeping->kept_s};
+        text += Description(*keeping);
+    }
     if (!file.empty()) {
         text += "file   " + file.string() + (exists ? "" : " (cannot be read)") + "\n";
     }
     console.Answer(data, text);
 }
 
-void Archive(const Console& console, const Request& request) {
+// Of an alert or a POS transaction, the recordings that its footage lies in.
+void ChangeKeeping(const Console& console, const Request& request, const auto& change, const char* what) {
     store::Store store = console.OpenStore();
-    if (!Events(store).SetArchived(request.id, !request.undo)) {
-        throw Failure(kNoInput, "there is no recorded event ", request.id, ": see lookhaven event list");
+    const Found found = RequireEvent(store, request.id);
+    std::vector<int> ids;
+    for (const Event& event : found.event ? std::vector{*found.event} : store::RecordingsOf(store, *found.mark)) {
+        ids.push_back(event.id);
     }
-    console.Answer(ToData(*Events(store).Find(request.id)), "Event ", request.id,
-                   request.undo ? " is no longer archived." : " is archived: it is kept beyond its mount's limits.");
+    if (store::KeptEvents kept(store); change(kept, ids) == 0) {
+        throw Failure(kNoInput, "there is no footage of event ", request.id);
+    }
+    console.Answer(Array(ids, [&](int id) { return ToData(*Events(store).Find(id)); }), "Event ", request.id, what);
+}
+
+void Keep(const Console& console, const Request& request) {
+    const auto keep = [&](store::KeptEvents& kept, const std::vector<int>& ids) {
+        return kept.Keep(ids, {request.note, "", base::WallSeconds()});
+    };
+    ChangeKeeping(console, request, keep, " is kept beyond its mount's limits.");
+}
+
+void Release(const Console& console, const Request& request) {
+    const auto release = [](store::KeptEvents& kept, const std::vector<int>& ids) { return kept.Release(ids); };
+    ChangeKeeping(console, request, release, " is no longer kept.");
 }
 
 void AddMark(const Console& console, const Request& request) {
@@ -245,13 +271,15 @@ void AddEvent(CLI::App& program, const Console& console) {
             .Option("--kind", request.kind, "The kind of events (default: recorded)", OneOf(kKinds))
             .Option("--reason", request.reason, "Events recorded for this reason", OneOf(kReasons))
             .Flag("--finished", request.finished, "Leave out events that are still being recorded")
+            .Flag("--kept", request.kept, "Only recorded events that are kept")
             .Option("--limit", request.limit, "Maximum number of events (default: 50)",
                     Satisfies(CLI::NonNegativeNumber));
     add_span(list, "Events");
     group.Add("show", "Shows an event", Show).Option("id", request.id, id, Required);
-    group.Add("archive", "Keeps a recorded event beyond its mount's limits", Archive)
+    group.Add("keep", "Keeps an event's footage beyond its mount's limits", Keep)
         .Option("id", request.id, id, Required)
-        .Flag("--undo", request.undo, "No longer keep it beyond them");
+        .Option("--note", request.note, "Why it is kept");
+    group.Add("release", "No longer keeps it beyond them", Release).Option("id", request.id, id, Required);
     group.Add("mark", "Reports an alert or POS transaction, whose footage is kept together", AddMark)
         .Option("camera", request.camera, "The camera's id", Required)
         .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(kMarkKinds))

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/event_text.h"
 
+#include <utility>
+
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
@@ -23,8 +25,8 @@ std::string SizeText(const Json::Value& size) {
 
 std::string StateText(const Json::Value& event) {
     std::string text;
-    for (const char* state : {"recording", "archived", "demo"}) {
-        if (event[state].asBool()) {
+    for (const auto& [member, state] : {std::pair{"recording", "recording"}, {"archived", "kept"}, {"demo", "demo"}}) {
+        if (event[member].asBool()) {
             text += (text.empty() ? "" : " ") + std::string(state);
         }
     }
@@ -85,10 +87,16 @@ std::string Description(const store::Event& event) {
                                                                          : Concat("reason ", event.reason);
     return Concat(
         "Event ", event.id, " of camera ", event.camera_id, ", ", reason, event.recording ? ", still recording" : "",
-        event.archived ? ", archived" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
+        event.archived ? ", kept" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
         "\nto     ", FormatMoment(event.end_s), "\nvideo  ", VideoTypeName(event.video_type), " ", event.width, "x",
         event.height, ", ", event.frame_count, " frames\naudio  ",
         event.audio_codec.empty() ? "none" : event.audio_codec, "\nsize   ", FormatSize(event.size_bytes), "\n");
+}
+
+std::string Description(const store::Keeping& keeping) {
+    return Concat("kept   by ", keeping.keeper.empty() ? "the command line" : keeping.keeper,
+                  keeping.kept_s == 0 ? "" : ", " + FormatMoment(keeping.kept_s),
+                  keeping.note.empty() ? "" : ": " + keeping.note, "\n");
 }
 
 std::string Description(const store::Mark& mark) {

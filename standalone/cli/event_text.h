@@ -8,6 +8,7 @@
 #include <json/json.h>
 
 #include "standalone/store/events.h"
+#include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
 
 namespace lookhaven::cli {
@@ -23,5 +24,6 @@ std::string MarkTable(const Json::Value& marks);
 // The record in several lines.
 std::string Description(const store::Event& event);
 std::string Description(const store::Mark& mark);
+std::string Description(const store::Keeping& keeping);
 
 }  // namespace lookhaven::cli

@@ -12,7 +12,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr std::array kNames{"ready", "not-mounted", "in-use", "failing", "space-held"};
+constexpr std::array kNames{"ready", "not-mounted", "in-use", "failing", "space-held", "kept-full"};
 
 std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "mounts";

@@ -20,9 +20,10 @@ enum class MountState {
     kInUse,       // the recorder of another state folder works on it
     kFailing,     // the reason says why; tried again with growing pauses
     kSpaceHeld,   // what deleted recordings held does not come free, so none are deleted to make room
+    kKeptFull,    // kept events alone reach its size limit, so all else is deleted as soon as it is finished
 };
 
-const char* NameOf(MountState state);  // "ready", "not-mounted", "in-use", "failing", "space-held"
+const char* NameOf(MountState state);  // "ready", "not-mounted", "in-use", "failing", "space-held", "kept-full"
 
 struct MountStatus {
     int mount = 0;

@@ -3,7 +3,7 @@
 // Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
 //
 // Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
-//               (2) Archived and growing events and those on unmounted mounts are kept.
+//               (2) Kept and growing events and those on unmounted mounts stay.
 //               (3) The oldest is what was recorded first, not what has the earliest date: clocks have been wrong.
 //               (4) A disk that stays full whatever is deleted does not cost more than what should have made room.
 // Thread safety One thread.

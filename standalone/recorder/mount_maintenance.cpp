@@ -9,6 +9,7 @@
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/recovery.h"
+#include "standalone/store/kept_events.h"
 
 namespace lookhaven::recorder {
 
@@ -107,6 +108,8 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         SetStatus(MountState::kFailing, recovery_failure_);
     } else if (disk_watch_.IsHeld()) {
         SetStatus(MountState::kSpaceHeld, mount.path);
+    } else if (mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes) {
+        SetStatus(MountState::kKeptFull, mount.path);
     } else {
         SetStatus(MountState::kReady, "");
     }
@@ -126,6 +129,7 @@ void MountMaintenance::SetStatus(MountState state, const std::string& reason) {
                          (state == MountState::kFailing     ? " fails: "
                           : state == MountState::kInUse     ? " is used by the recorder of another state folder: "
                           : state == MountState::kSpaceHeld ? " gets no space back from deleted recordings: "
+                          : state == MountState::kKeptFull  ? " holds nothing but kept recordings within its limit: "
                                                             : " is not there: ") +
                          reason);
     }

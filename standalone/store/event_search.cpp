@@ -61,8 +61,9 @@ void Search(Connection& connection, soci::session& sql, const EventFilter& filte
     const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
     const std::string condition =
         " and start_s >= :earliest and start_s < :end and end_s > :begin and :mount in (0, mount_id)"
-        " and :reason in (0, reason) and (:finished = 0 or recording = 0) order by " +
-        order + " limit :limit";
+        " and :reason in (0, reason) and (:finished = 0 or recording = 0)" +
+        // As the condition of an index: kept events are few.
+        std::string(filter.kept_only ? " and archived = 1" : "") + " order by " + order + " limit :limit";
     EachCamera(connection, sql, filter.camera_ids, condition, order, visit, earliest, filter.end_s, filter.begin_s,
                filter.mount_id, filter.reason, filter.finished_only, limit);
 }

@@ -122,10 +122,6 @@ bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t si
     return SetProgress(connection_, id, end_s, frame_count, size_bytes, false);
 }
 
-bool Events::SetArchived(int id, bool archived) {
-    return connection_.Execute("update events set archived = :archived where id = :id", archived, id) > 0;
-}
-
 int Events::Remove(std::span<const int> ids) {
     return connection_.Write(
         [&](soci::session& sql) { return ForEachId(sql, ids, "delete from events where id = :id"); });

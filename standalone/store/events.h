@@ -44,7 +44,7 @@ struct Event {
     int width = 0;
     int height = 0;
     std::string path;       // relative to the mount
-    bool archived = false;  // retention leaves it alone
+    bool archived = false;  // kept: retention leaves it alone (kept_events.h)
     bool demo = false;      // demo data: there is no file
     // Lower is earlier, whatever the clock said. Its id, but for old recordings that got a new id; kOrderOfId until the
     // row is stored.
@@ -61,6 +61,7 @@ struct EventFilter {
     std::int64_t end_s = std::numeric_limits<std::int64_t>::max();  // … up to, not including, here
     int reason = 0;                                                 // 0: any
     bool finished_only = false;
+    bool kept_only = false;
     bool newest_first = false;
     int offset = 0;
     int limit = std::numeric_limits<int>::max();
@@ -123,18 +124,17 @@ class Events {
     void Begin(const Event& event);
     // Stores finished rows under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(std::span<const Event> events);
-    // end_s: the event's last second on the mount. These three are false when there is no such row; the first two throw
+    // end_s: the event's last second on the mount. Both are false when there is no such row, and throw
     // InvalidRecord where the event would end before it starts or become too long. A power cut may lose a Grow that has
     // returned, never a Finish.
     bool Grow(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
     bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
-    bool SetArchived(int id, bool archived);
 
     // In one transaction; returns the number of rows removed. For rows without a file.
     int Remove(std::span<const int> ids);
 
     // Removing files with their rows. Until FinishDeletion or CancelDeletion the rows are found by PendingDeletion
-    // alone. Each is one transaction. BeginDeletion leaves out growing and archived events: remove the files of
+    // alone. Each is one transaction. BeginDeletion leaves out growing and kept events: remove the files of
     // PendingDeletion only.
     void BeginDeletion(std::span<const int> ids);
     void FinishDeletion(std::span<const int> ids);
@@ -158,7 +158,7 @@ class Events {
 
     // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();
-    // Finished events of the mount that are neither archived nor demo, in the order in which they were recorded: those
+    // Finished events of the mount that are neither kept nor demo, in the order in which they were recorded: those
     // after that event, from the first on after Event().
     std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
     // Of the event's row that is pending deletion; nothing when there is none.

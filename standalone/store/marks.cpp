@@ -200,4 +200,9 @@ std::vector<Mark> Marks::OnMount(int mount_id) {
                                       MarkState::kSaved);
 }
 
+std::vector<Event> RecordingsOf(Store& store, const Mark& mark) {
+    return Events(store).List(
+        {.camera_ids = {mark.camera_id}, .begin_s = mark.start_s, .end_s = std::max(mark.end_s, mark.start_s + 1)});
+}
+
 }  // namespace lookhaven::store

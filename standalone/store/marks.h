@@ -117,4 +117,7 @@ class Marks {
     Connection& connection_;
 };
 
+// The recordings that the mark's footage lies in, growing ones too.
+std::vector<Event> RecordingsOf(Store& store, const Mark& mark);
+
 }  // namespace lookhaven::store

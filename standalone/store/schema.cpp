@@ -190,6 +190,14 @@ constexpr const char* kSessionAddresses[] = {
     "alter table sessions add column address text not null default ''",
 };
 
+// Why events are kept; "archived" in their rows says that they are.
+constexpr const char* kKeptEvents[] = {
+    "create table kept_events (event_id integer not null primary key references events (id) on delete cascade,"
+    " note text not null, keeper text not null, kept_s bigint not null)",
+    "insert into kept_events (event_id, note, keeper, kept_s) select id, '', '', 0 from events where archived = 1",
+    "create index events_kept on events (camera_id, start_s) where archived = 1",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -205,6 +213,7 @@ constexpr Migration kMigrations[] = {
     {"the order of cameras", kCameraOrder},
     {"recording by the hour of the week", kSchedules},
     {"where a log-in came from", kSessionAddresses},
+    {"why events are kept", kKeptEvents},
 };
 
 }  // namespace

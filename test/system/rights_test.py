@@ -44,6 +44,7 @@ Event.Get event={event}                                               E      E  
 Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Next cameralists={camera} time=-1d: event                       E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Event.Frame event={event} time_ms=0                                   E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
+POST Event.Keep event={event} note=x                                  E      E     F       F     F    F       F        F      D/N     E
 Event.Download event={event}                                          E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Pairing.Cameras                                                       E      E     E       E     E    E       E        E      E       D
 Picture.Get camera={camera}                                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E

@@ -82,6 +82,14 @@ export class FootageCache {
     return answer;
   }
 
+  /** Lets `load` with `refresh` fetch again what touches the span: something of it was changed. */
+  expire({ camera, start, stop }: Footage): void {
+    for (let at = spanStart(start); at <= stop; at += kSpanS) {
+      const span = this.#spans.get(keyOf(camera, at));
+      if (span) span.isOpen = true;
+    }
+  }
+
   async #fetch(cameras: readonly number[], start: number): Promise<void> {
     const isOpen = Date.now() / 1000 < start + kSpanS + 60;
     const end = start + kSpanS;
@@ -93,11 +101,13 @@ export class FootageCache {
         throw error;
       }),
     ]);
+    const hasKept = histories.some(({ events }) => events.some(({ isKept }) => isKept));
+    const kept = new Map((hasKept ? await this.#recordings.kept(start, end, cameras) : []).map((one) => [one.id, one]));
     for (const camera of cameras) {
       const history = histories.find((one) => one.camera === camera);
       const coverage = history?.coverage;
       this.#keep(keyOf(camera, start), {
-        events: history?.events ?? [],
+        events: (history?.events ?? []).map((one) => ({ ...one, ...notesOf(kept.get(one.id)) })),
         marks: marks.filter((mark) => mark.camera === camera),
         segments: coverage ? segmentsOf(start, end, coverage.interval, coverage.runs) : [],
         isOpen: isOpen || (history?.events.some((event) => event.isGrowing) ?? false),
@@ -115,6 +125,10 @@ export class FootageCache {
       this.#spans.delete(oldest);
     }
   }
+}
+
+function notesOf(kept: Footage | undefined): Partial<Footage> {
+  return kept ? { note: kept.note, keeper: kept.keeper } : {};
 }
 
 function spanStart(timeS: number): number {

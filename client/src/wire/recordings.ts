@@ -17,9 +17,10 @@ export function isSameFootage(one: FootageRef, other: FootageRef | null | undefi
   return one.kind === other?.kind && one.id === other.id;
 }
 
-/** What a mark says and who says so, a line each; empty for a recording. */
-export function describeMark({ text, reporter }: Footage): string {
-  return [text, reporter && `Reported by ${reporter}`].filter(Boolean).join("\n");
+/** What a mark says and who says so, and why it is kept, a line each; empty for a recording that is not kept. */
+export function describe({ text, reporter, isKept, note, keeper }: Footage): string {
+  const kept = isKept && `Kept${keeper && ` by ${keeper}`}${note && `: ${note}`}`;
+  return [text, reporter && `Reported by ${reporter}`, kept].filter(Boolean).join("\n");
 }
 
 /** Something that can be played. */
@@ -42,6 +43,11 @@ export interface Footage extends FootageRef {
   reporter: string;
   /** There is something to play. */
   isSaved: boolean;
+  /** Retention leaves it alone. Of a mark known only where it was looked up by itself. */
+  isKept: boolean;
+  /** Why it is kept, and who says so; empty where that is not known. */
+  note: string;
+  keeper: string;
 }
 
 /** What the user tells apart: recordings by their reason, and marks. */
@@ -95,6 +101,9 @@ interface RawEvent {
   frame_count: number;
   record_type: number;
   is_recording: boolean;
+  archived?: boolean;
+  note?: string;
+  kept_by?: string;
 }
 
 interface RawMark {
@@ -108,6 +117,7 @@ interface RawMark {
   state: "pending" | "saved" | "missed";
   reported_by: string;
   text: string[];
+  archived?: boolean;
 }
 
 interface RawHistory {
@@ -173,6 +183,20 @@ export class Recordings {
       cameralists: cameras.join(),
     });
     return answer.event.map(markOf);
+  }
+
+  /** The kept recordings of the span, with their notes. */
+  async kept(fromS: number, toS: number, cameras: readonly number[]): Promise<Footage[]> {
+    const span = { from: String(fromS), to: String(toS), limit: String(kMaxMarks) };
+    const asked = { ...span, kept: "true", cameralists: cameras.join() };
+    const { event } = await this.#server.call<{ event: (RawEvent & { camera_id: number })[] }>("VEXO.Event", "List", asked);
+    return event.map((one) => footageOf(one, one.camera_id));
+  }
+
+  /** Keeps the recordings of the footage, or gives them back to retention. For managers. */
+  async keep({ kind, id }: FootageRef, isKept: boolean, note: string): Promise<void> {
+    const form = { event: String(id), ...kindParameter(kind), keep: String(isKept), note };
+    await this.#server.call<unknown>("VEXO.Event", "Keep", {}, { form });
   }
 
   async groups(): Promise<Group[]> {
@@ -277,11 +301,14 @@ function footageOf(raw: RawEvent, camera: number): Footage {
     text: "",
     reporter: "",
     isSaved: true,
+    isKept: raw.archived ?? false,
+    note: raw.note ?? "",
+    keeper: raw.kept_by ?? "",
   };
 }
 
-function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, text }: RawMark): Footage {
-  const unknown = { frameCount: 0, isGrowing: false, reason: 0 };
+function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, text, archived }: RawMark): Footage {
+  const unknown = { frameCount: 0, isGrowing: false, reason: 0, note: "", keeper: "" };
   return {
     id,
     kind,
@@ -292,6 +319,7 @@ function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, te
     text: text.join("\n"),
     reporter: reported_by,
     isSaved: state === "saved",
+    isKept: archived ?? false,
     ...unknown,
   };
 }

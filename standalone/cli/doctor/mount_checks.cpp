@@ -18,6 +18,7 @@
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
+#include "standalone/store/kept_events.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
 
@@ -38,12 +39,22 @@ Findings CheckSpace(store::Store& store, const store::Mount& mount, const mainte
                                    " left, recording needs ", FormatSize(space.ReserveBytes())),
                             "free space on its disk, or lower its limit with lookhaven mount set"});
     }
+    const std::int64_t kept = store::KeptEvents(store).SizeBytes(mount.id);
+    if (mount.max_bytes > 0 && kept >= mount.max_bytes) {
+        findings.push_back(
+            {Concat("kept recordings alone take ", FormatSize(kept), " of ", TitleOf(mount), ", whose limit is ",
+                    FormatSize(mount.max_bytes), ": whatever else is recorded is deleted at once"),
+             Concat(
+                 "lookhaven event list --kept, then lookhaven event release, or raise the limit: lookhaven mount set ",
+                 mount.id, " --limit")});
+        return findings;
+    }
     const std::int64_t held = store::Events(store).Content(mount.id).size_bytes;
     if (mount.max_bytes > 0 && held > mount.max_bytes + mount.max_bytes / 10) {
         findings.push_back(
             {Concat(TitleOf(mount), " holds ", FormatSize(held), " of recordings, above its limit of ",
                     FormatSize(mount.max_bytes)),
-             "start the recorder, which removes the oldest; archived events stay, raise the limit for them"});
+             "start the recorder, which removes the oldest; kept events stay, raise the limit for them"});
     }
     return findings;
 }

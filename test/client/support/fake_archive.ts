@@ -14,6 +14,8 @@ export interface Recorded {
   reason?: number;
   isGrowing?: boolean;
   text?: string;
+  /** Why it is kept; absent where it is not. */
+  note?: string | undefined;
 }
 
 interface Stream {
@@ -64,11 +66,20 @@ export class FakeArchive {
       case "VEXO.Lookhaven.Player SearchAvaiDate":
         return json({ search_time: number("start"), available_day: this.#days(query) });
       case "VEXO.Event List":
+        if (query.get("kept")) {
+          const kept = (camera: number) => this.#overlapping(camera, number("from"), number("to"), false).filter((one) => one.note !== undefined);
+          return json({ event: idsOf(query).flatMap((camera) => kept(camera).map((one) => ({ ...rawEvent(one), camera_id: camera }))) });
+        }
         return json({ event: idsOf(query).flatMap((camera) => this.#overlapping(camera, number("from"), number("to"), true).map(rawMark)) });
       case "VEXO.Event Get": {
         const kind = query.get("kind") ?? "event";
         const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
         return !one ? json(null, 404) : json(kind === "event" ? { ...rawEvent(one), camera_id: one.camera } : rawMark(one));
+      }
+      case "VEXO.Event Keep": {
+        const one = this.recorded.find(({ id }) => id === number("event"));
+        if (one) one.note = query.get("keep") === "true" ? query.get("note")! : undefined;
+        return json({ event: [] });
       }
       case "VEXO.Event Next":
         return json({ event: this.#next(query) });
@@ -187,8 +198,9 @@ function idsOf(query: URLSearchParams): number[] {
   return (query.get("cameralists") ?? "").split(",").map(Number);
 }
 
-function rawEvent({ id, start, stop, frames, reason = 1, isGrowing = false }: Recorded) {
-  return { id, start, stop, frame_count: frames, record_type: reason, is_recording: isGrowing };
+function rawEvent({ id, start, stop, frames, reason = 1, isGrowing = false, note }: Recorded) {
+  const kept = note === undefined ? {} : { archived: true, note, kept_by: "admin" };
+  return { id, start, stop, frame_count: frames, record_type: reason, is_recording: isGrowing, ...kept };
 }
 
 function rawMark({ id, kind, camera, start, stop, text = "" }: Recorded) {

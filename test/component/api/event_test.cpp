@@ -181,6 +181,34 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
     EXPECT_EQ(Ask(download).status, 404) << "a file that is gone";
 }
 
+TEST_F(EventApi, KeepsWhatAManagerSaysAndTellsWhoDid) {
+    const int event = footage_.Record(1, 1'772'366'400, 30);
+    const int hidden = footage_.Record(2, 1'772'366'400, 30);
+    const int alert = footage_.Mark(1, 1, 1'772'366'410, 5, "door", event);
+    const std::string keep = "Event&version=1&method=Keep";
+    const auto kept = [&](bool as_viewer) {
+        std::string found;
+        const Json::Value answer = Ask("Event&version=1&method=List&kept=true", "", as_viewer).Json();
+        for (const Json::Value& each : answer["data"]["event"]) {
+            found += std::to_string(each["id"].asInt()) + each["kept_by"].asString() + each["note"].asString() + ' ';
+        }
+        return found;
+    };
+    const std::string id = "event=" + std::to_string(event);
+    EXPECT_EQ(Ask(keep, id, true).status, 403);
+    EXPECT_EQ(Ask(keep, id + "&note=a%0Ab").status, 400);
+    EXPECT_EQ(Ask(keep, "kind=pos&event=" + std::to_string(alert)).status, 404);
+    EXPECT_EQ(kept(false), "");
+    const std::string mark = "kind=alert&event=" + std::to_string(alert);
+    EXPECT_EQ(Ask(keep, mark + "&note=police").Json()["data"]["event"][0]["note"], "police");
+    EXPECT_EQ(Ask(keep, "event=" + std::to_string(hidden)).status, 200);
+    EXPECT_EQ(Ask("Event&version=1&method=Get&" + mark, "", true).Json()["data"]["archived"], true);
+    EXPECT_EQ(kept(true), std::to_string(event) + "adminpolice ");
+    EXPECT_EQ(kept(false), std::to_string(hidden) + "admin " + kept(true));
+    EXPECT_EQ(Ask(keep, id + "&keep=false").Json()["data"]["event"][0]["archived"], false);
+    EXPECT_EQ(kept(true), "");
+}
+
 TEST_F(EventApi, WalksThroughWhatCanBePlayed) {
     const std::int64_t noon = 1'772'366'400;
     const int first = footage_.Record(1, noon, 30);

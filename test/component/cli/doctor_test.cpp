@@ -213,6 +213,15 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
              store::Events(store).AddAll(std::vector{event});
          },
          "above its limit", [&] { EXPECT_EQ(Run("mount set 2 --limit 1G").code, 0); }},
+        {"kept footage that fills the limit",
+         [&] {
+             Sql("update mounts set max_bytes = 10")();
+             store::Store store = Open();
+             store::Event event;
+             event.camera_id = 1, event.mount_id = 2, event.size_bytes = 10, event.archived = true;
+             store::Events(store).AddAll(std::vector{event});
+         },
+         "whatever else is recorded is deleted at once", [&] { EXPECT_EQ(Run("mount set 2 --limit 1G").code, 0); }},
         {"camera that is down", Tell({refuses}), "(Entrance) has sent no picture since ",
          [&] {
              EXPECT_EQ(Run("camera set 1 --account root", "camera-s3cret\n").code, 0);

@@ -128,10 +128,13 @@ TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
           {"event show 3", 0, "still recording"},
           {"event show 1", 0, "cannot be read"},
           {"event show 99", 66, "no event 99"},
-          {"event archive 2", 0, "is kept"},
-          {"event show 2", 0, "archived"},
-          {"event archive 2 --undo --json", 0, "\"archived\" : false"},
-          {"event archive 99", 66, "no recorded event 99"},
+          {"event keep 2 --note 'police 12/7'", 0, "is kept"},
+          {"event show 2", 0, ": police 12/7"},
+          {"event list --kept", 0, "kept", "demo"},
+          {"event keep 2 --note \"$(printf 'a\\tb')\"", 65, "a note is"},
+          {"event release 2 --json", 0, "\"archived\" : false"},
+          {"event list --kept", 0, "no such event"},
+          {"event keep 99", 66, "no event 99"},
           {"event export 1 " + (folder_ / "out.mkv").string(), 66, ""}});
     EXPECT_FALSE(std::filesystem::exists(folder_ / "out.mkv")) << "what failed leaves nothing behind";
 }

@@ -22,6 +22,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/verify.h"
+#include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
 #include "test/support/folder.h"
 #include "test/support/footage/footage.h"
@@ -219,21 +220,23 @@ TEST_F(RetentionTest, AWrongDateNeitherDeletesNorKeeps) {
 }
 
 TEST_F(RetentionTest, WhatIsKeptOnPurposeOrUnknownStays) {
-    const int archived = footage_.Record(1, kNoon, 60);
+    const int kept = footage_.Record(1, kNoon, 60);
     const int growing = footage_.Record(1, kNoon + 100, 60);
     const int plain = footage_.Record(1, kNoon + 200, 60);
     store::Events events(footage_.Records());
-    events.SetArchived(archived, true);
+    store::KeptEvents(footage_.Records()).Keep(std::array{kept}, {"for the police", "admin", kNoon});
     store::Event open = *events.Find(growing);
     open.recording = true;
     events.Remove(std::array{growing});
     events.Begin(open);
     const fs::path stranger = footage_.FileOf(plain).parent_path() / "holiday.mkv";
     std::ofstream(stranger) << "mine";
-    Run(1);
-    EXPECT_THAT(Left(), ElementsAre(archived, growing));
+    for (const std::int64_t max_age_s : {0, 1}) {
+        Run(1, max_age_s);
+        EXPECT_THAT(Left(), ElementsAre(kept, growing));
+    }
     EXPECT_TRUE(fs::exists(stranger));
-    EXPECT_TRUE(fs::exists(footage_.FileOf(archived)) && fs::exists(footage_.FileOf(growing)));
+    EXPECT_TRUE(fs::exists(footage_.FileOf(kept)) && fs::exists(footage_.FileOf(growing)));
 }
 
 TEST_F(RetentionTest, ADiskThatIsNotThereLosesNoRow) {
@@ -313,12 +316,12 @@ TEST_F(RetentionTest, AnAlarmGoesWithTheLastOfItsFootage) {
     EXPECT_FALSE(fs::exists(footage_.Mount() / "1"));
 }
 
-TEST_F(RetentionTest, MarksThatArchivedFootageKeepsHideNoOther) {
-    const int archived = footage_.Record(1, kNoon, 60);
+TEST_F(RetentionTest, MarksThatKeptFootageKeepsHideNoOther) {
+    const int kept = footage_.Record(1, kNoon, 60);
     const int plain = footage_.Record(1, kNoon + 60, 60);
-    store::Events(footage_.Records()).SetArchived(archived, true);
+    store::KeptEvents(footage_.Records()).Keep(std::array{kept}, {});
     for (int i = 0; i < 120; ++i) {
-        footage_.Mark(1, 1, kNoon + 10, 5, "kept", archived);
+        footage_.Mark(1, 1, kNoon + 10, 5, "kept", kept);
     }
     footage_.Mark(1, 1, kNoon + 80, 5, "gone", plain);
     EXPECT_EQ(Run(1).marks, 1);

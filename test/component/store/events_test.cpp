@@ -7,6 +7,7 @@
 #include <random>
 
 #include "standalone/store/events.h"
+#include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/recording_plans.h"
 #include "test/component/store/store_fixture.h"
@@ -212,14 +213,25 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), ElementsAre(finished));
     events_.CancelDeletion(std::array{event.id});
     EXPECT_EQ(events_.Find(event.id), finished);
-    EXPECT_TRUE(events_.SetArchived(event.id, true));
-    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty());
     const int unknown = events_.NextId();
+    KeptEvents kept(store_);
+    EXPECT_EQ(kept.Keep(std::array{event.id, unknown}, {"first", "guest", 4}), 1);
+    EXPECT_EQ(kept.Keep(std::array{event.id}, {"it's theirs", "admin", 5}), 1);
+    EXPECT_EQ(kept.Find(event.id), (Keeping{"it's theirs", "admin", 5}));
+    EXPECT_THROW(kept.Keep(std::array{event.id}, {"a\nb", "", 0}), InvalidRecord);
+    EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty());
+    events_.BeginDeletion(std::array{event.id});
+    const EventFilter kept_only{.camera_ids = {event.camera_id}, .kept_only = true};
+    EXPECT_THAT(Ids(events_.List(kept_only)), ElementsAre(event.id)) << "nothing deletes it";
+    EXPECT_EQ(kept.SizeBytes(event.mount_id), 6);
+    EXPECT_EQ(kept.Release(std::array{event.id, unknown}), 1);
+    EXPECT_THAT(events_.List(kept_only), IsEmpty());
+    EXPECT_FALSE(kept.Find(event.id));
+    EXPECT_EQ(kept.Keep(std::array{event.id}, {}), 1);
     EXPECT_GT(unknown, event.id);
-    EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1) ||
-                 events_.SetArchived(unknown, true));
+    EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1));
     EXPECT_EQ(events_.Remove(std::vector{event.id, unknown, event.id}), 1);
-    EXPECT_FALSE(events_.Find(event.id));
+    EXPECT_FALSE(events_.Find(event.id) || kept.Find(event.id));
     for (const auto& spoil : std::initializer_list<void (*)(Event&)>{
              [](Event& e) { e.end_s = e.start_s - 1; },
              [](Event& e) { e.end_s = e.start_s + base::kMaxRecordingSeconds + 1; }, [](Event& e) { e.start_s = -5; },

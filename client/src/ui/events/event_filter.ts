@@ -6,6 +6,7 @@ import { kEventKinds, type EventKind } from "../../playback/coverage";
 import type { Group } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
+import { icon } from "../widgets/icons";
 import { kKindNames } from "./event_list";
 
 /** As many as the timeline shows without scrolling; the user may choose more. */
@@ -16,6 +17,7 @@ const kStorageKey = "lookhaven.events";
 interface Stored {
   cameras?: number[];
   kinds?: EventKind[];
+  isKeptOnly?: boolean;
 }
 
 export class EventFilter {
@@ -27,12 +29,14 @@ export class EventFilter {
   #cameras: readonly Camera[] = [];
   #chosen = new Set<number>();
   #kinds = new Set<EventKind>(kEventKinds);
+  #isKeptOnly = false;
 
   constructor(changed: () => void) {
     this.#changed = changed;
     const stored = readStored();
     if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds!.includes(kind)));
     if (stored.cameras) this.#chosen = new Set(stored.cameras);
+    this.#isKeptOnly = stored.isKeptOnly ?? false;
     const kinds = kEventKinds.map((kind) => {
       const box = element("input", { type: "checkbox", checked: this.#kinds.has(kind) });
       box.addEventListener("change", () => {
@@ -43,7 +47,7 @@ export class EventFilter {
       return element("label", { class: "chip" }, box, element("span", { class: "row-swatch", "data-kind": kind }), kKindNames[kind]);
     });
     const cameras = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
-    const kindRow = element("div", { class: "chips", role: "group", "aria-label": "Kinds of events" }, ...kinds);
+    const kindRow = element("div", { class: "chips", role: "group", "aria-label": "Kinds of events" }, ...kinds, this.#keptChip());
     this.root = element("section", { class: "filter", "aria-label": "Filter" }, cameras, kindRow);
   }
 
@@ -53,6 +57,11 @@ export class EventFilter {
 
   get kinds(): ReadonlySet<EventKind> {
     return this.#kinds;
+  }
+
+  /** The list shows kept recordings alone. */
+  get isKeptOnly(): boolean {
+    return this.#isKeptOnly;
   }
 
   setCameras(cameras: readonly Camera[]): void {
@@ -86,6 +95,15 @@ export class EventFilter {
     this.#save();
   }
 
+  #keptChip(): HTMLElement {
+    const box = element("input", { type: "checkbox", checked: this.#isKeptOnly });
+    box.addEventListener("change", () => {
+      this.#isKeptOnly = box.checked;
+      this.#save();
+    });
+    return element("label", { class: "chip", title: "Only recordings that are kept" }, box, icon("kept"), "Kept");
+  }
+
   #showCameras(): void {
     this.#summary.textContent = `Cameras · ${this.cameras.length} of ${this.#cameras.length}`;
     this.#cameraRow.replaceChildren(
@@ -103,7 +121,8 @@ export class EventFilter {
   }
 
   #save(): void {
-    localStorage.setItem(kStorageKey, JSON.stringify({ cameras: [...this.#chosen], kinds: [...this.#kinds] } satisfies Stored));
+    const stored: Stored = { cameras: [...this.#chosen], kinds: [...this.#kinds], isKeptOnly: this.#isKeptOnly };
+    localStorage.setItem(kStorageKey, JSON.stringify(stored));
     this.#changed();
   }
 }

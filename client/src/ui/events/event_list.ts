@@ -3,8 +3,9 @@
 // The events and marks of a span as cards with a picture each, newest first; only those on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
-import { isSameFootage, describeMark, type Footage, type FootageRef } from "../../wire/recordings";
+import { describe, isSameFootage, type Footage, type FootageRef } from "../../wire/recordings";
 import { element, setText } from "../widgets/dom";
+import { icon } from "../widgets/icons";
 import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
 import { StillLoader } from "./still_loader";
 
@@ -125,7 +126,8 @@ export class EventList {
   #newRow(one: Footage): HTMLElement {
     const parts = ["row-swatch", "row-time", "row-name", "row-text", "row-side"].map((name) => element("span", { class: name }));
     const still = element("img", { class: "row-still", alt: "" });
-    const button = element("button", { type: "button", class: "row-open" }, ...parts, still);
+    const kept = element("span", { class: "row-kept" }, icon("kept"), element("span", { class: "unseen" }, "kept"));
+    const button = element("button", { type: "button", class: "row-open" }, ...parts, still, kept);
     const row = element("div", { class: "row", role: "listitem", "data-ref": `${one.kind}${one.id}` }, button);
     button.addEventListener("click", () => {
       const one = this.#footage[Number(row.dataset["at"])];
@@ -146,9 +148,10 @@ export class EventList {
     setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
     setText(side, one.isGrowing ? "recording" : one.isSaved ? duration(one.stop - one.start) : "no footage");
     side.classList.toggle("recording", one.isGrowing);
+    button.querySelector<HTMLElement>(".row-kept")!.hidden = !one.isKept;
     button.disabled = !one.isSaved;
     button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
-    button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describeMark(one)].filter(Boolean).join("\n");
+    button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describe(one)].filter(Boolean).join("\n");
     button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
     // A mark's footage may come later than its row.
     if (one.isSaved && !row.dataset["still"]) {

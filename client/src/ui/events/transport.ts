@@ -11,6 +11,7 @@ import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { preciseTime, rateText, shortDate } from "../widgets/text";
 import { eventText } from "./event_list";
+import type { KeepButton } from "./keep_button";
 
 export interface TransportActions {
   toggle(): void;
@@ -28,6 +29,7 @@ export class Transport {
   readonly #recordings: Recordings;
   readonly #walk: EventWalk;
   readonly #nameOf: (camera: number) => string;
+  readonly #keeping: KeepButton;
   readonly #play: HTMLButtonElement;
   readonly #before: HTMLButtonElement;
   readonly #after: HTMLButtonElement;
@@ -42,8 +44,10 @@ export class Transport {
     recordings: Recordings,
     walk: EventWalk,
     nameOf: (camera: number) => string,
+    keeping: KeepButton,
     actions: TransportActions,
   ) {
+    this.#keeping = keeping;
     this.#playback = playback;
     this.#recordings = recordings;
     this.#walk = walk;
@@ -71,6 +75,7 @@ export class Transport {
       "div",
       { class: "transport-side" },
       iconButton("now", "Go to now", () => actions.now()),
+      keeping.root,
       this.#download,
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
     );
@@ -92,6 +97,7 @@ export class Transport {
     const frameCount = lead?.player.frameCount ?? 0;
     const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
     setText(this.#frame, footage ? `frame ${(lead?.player.index ?? 0) + 1}${frames}` : "");
+    this.#keeping.show(footage);
     if (footage) this.#download.href = this.#recordings.downloadAddress(footage);
     else this.#download.removeAttribute("href");
   }

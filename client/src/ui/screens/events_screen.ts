@@ -13,6 +13,7 @@ import { ServerError, type Camera } from "../../wire/server";
 import { Calendar } from "../events/calendar";
 import { EventFilter } from "../events/event_filter";
 import { EventList, eventText } from "../events/event_list";
+import { KeepButton } from "../events/keep_button";
 import { Stage } from "../events/stage";
 import { Transport } from "../events/transport";
 import { spanText } from "../timeline/time_scale";
@@ -85,7 +86,8 @@ export class EventsScreen extends Screen {
       moved: () => this.#onTimelineMoved(),
     });
     this.#calendar = new Calendar(this.#days, () => this.#chosenCameras(), (dayMs) => this.#pickDay(dayMs));
-    this.#transport = new Transport(this.#playback, this.#recordings, this.#walk, (camera) => this.#nameOf(camera), {
+    const keeping = new KeepButton(this.#recordings, session.account.is_manager, (footage) => this.#onKeepingChanged(footage));
+    this.#transport = new Transport(this.#playback, this.#recordings, this.#walk, (camera) => this.#nameOf(camera), keeping, {
       toggle: () => this.#togglePlaying(),
       step: (by) => this.#playback.step(by),
       skip: (by) => void this.#skip(by),
@@ -93,7 +95,7 @@ export class EventsScreen extends Screen {
       now: () => this.#timeline.showNow(),
       fullScreen: toggleFullScreen,
     });
-    this.#build();
+    this.#build(keeping);
     const onVisibility = () => this.#onVisibility();
     document.addEventListener("visibilitychange", onVisibility, { signal: this.closed });
     this.every(kRefreshMs, () => this.#refresh());
@@ -130,6 +132,7 @@ export class EventsScreen extends Screen {
   }
 
   protected pressKey(event: KeyboardEvent): boolean {
+    if (this.root.querySelector("dialog[open]")) return false;
     // From day to day and from row to row, for whoever came there with the keyboard.
     const isWithin = (selector: string) => !hasFocusByPointer() && (event.target as Element).closest(selector) !== null;
     if (event.key.startsWith("Arrow") && isWithin(".calendar-days")) return false;
@@ -146,7 +149,7 @@ export class EventsScreen extends Screen {
     return true;
   }
 
-  #build(): void {
+  #build(keeping: KeepButton): void {
     const zoom = element(
       "div",
       { class: "timeline-zoom", role: "group", "aria-label": "Zoom" },
@@ -165,7 +168,12 @@ export class EventsScreen extends Screen {
     );
     this.#body.append(main, side);
     this.addToBar(this.#status);
-    this.front.append(this.#body);
+    this.front.append(this.#body, keeping.dialog);
+  }
+
+  #onKeepingChanged(footage: Footage): void {
+    this.#cache.expire(footage);
+    this.#reload();
   }
 
   async #load(): Promise<void> {
@@ -283,7 +291,7 @@ export class EventsScreen extends Screen {
       .flatMap((camera) => this.#cache.get(camera, fromS, toS).footage)
       .filter((one) => one.stop >= fromS && one.start < toS);
     const rows = recorded
-      .filter((one) => this.#filter.kinds.has(kindOf(one)))
+      .filter((one) => this.#filter.kinds.has(kindOf(one)) && (one.isKept || !this.#filter.isKeptOnly))
       .sort((one, other) => other.start - one.start || other.id - one.id);
     const head = `${rows.length} ${rows.length === 1 ? "event" : "events"} · ${span}`;
     const nothing = this.#cache.isBusy ? "" : this.#whyNothing(recorded.length);
@@ -295,7 +303,7 @@ export class EventsScreen extends Screen {
   #whyNothing(hidden: number): string {
     if (this.#cameras.length === 0) return "";
     if (this.#chosenCameras().length === 0) return "No camera is chosen. Choose some under “Cameras”.";
-    if (hidden > 0) return `The filter hides ${hidden === 1 ? "one event" : `${hidden} events`}. Choose more kinds to see them.`;
+    if (hidden > 0) return `The filter hides ${hidden === 1 ? "one event" : `${hidden} events`}. Choose more kinds, or not only kept ones, to see them.`;
     if (this.#calendar.isLoading) return "";
     if (this.#calendar.hasRecordings) return "No events in this time span. The calendar marks the days with recordings.";
     return (

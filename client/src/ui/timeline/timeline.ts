@@ -6,7 +6,7 @@
 import { kindOf, type EventKind } from "../../playback/coverage";
 import type { FootageCache } from "../../playback/footage_cache";
 import { midnight, type RecordedDays } from "../../playback/recorded_days";
-import { describeMark, type Footage, type FootageRef } from "../../wire/recordings";
+import { describe, type Footage, type FootageRef } from "../../wire/recordings";
 import { element } from "../widgets/dom";
 import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
@@ -264,7 +264,7 @@ export class Timeline {
     if (camera === undefined || pointerType === "touch") return this.#hint.hide();
     const atMs = this.#scale.msAt(x);
     const { event, mark } = this.#footageAt(camera, x);
-    const about = mark ? describeMark(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";
+    const about = mark ? describe(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";
     this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`);
   }
 

@@ -148,6 +148,23 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.evaluate(() => document.documentElement.scrollWidth)).toBe(390);
   }, 40_000);
 
+  test("a recording is kept with a note, found again by the filter, and released", async () => {
+    const page = await opened("#event=14", 1440, 900);
+    await state(page, "playing");
+    await page.click("button[aria-label='Keep this recording']");
+    await page.keyboard.type("police [4]");
+    await page.keyboard.press("Enter");
+    await page.locator("button[aria-label='Kept by admin: police [4]']").waitFor();
+    await page.locator("[data-ref=event14] .row-kept").waitFor();
+    await page.locator(".chips label", { hasText: "Kept" }).click();
+    await page.locator(".list-head", { hasText: /^1 event · / }).waitFor();
+    expect(await page.getAttribute("[data-ref=event14] button", "title")).toMatch(/\nKept by admin: police \[4\]$/);
+    await page.click(".keep-button");
+    await page.click(".dialog button:text-is('Release')");
+    await page.locator(".list-head", { hasText: /^0 events · / }).waitFor();
+    await page.evaluate(() => localStorage.clear());
+  }, 40_000);
+
   test("a phone, too, says that there is nothing only once it knows", async () => {
     const page = await opened("#events", 390, 844);
     const note = await page.waitForFunction(() => document.querySelector(".list-note")?.textContent);

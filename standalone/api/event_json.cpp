@@ -1,0 +1,70 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/event_json.h"
+
+#include <algorithm>
+
+#include "standalone/store/kept_events.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+Json::Value LinesOf(const std::string& text) {
+    Json::Value lines(Json::arrayValue);
+    for (std::size_t at = 0; at < text.size();) {
+        const std::size_t end = std::min(text.find('\n', at), text.size());
+        lines.append(text.substr(at, end - at));
+        at = end + 1;
+    }
+    return lines;
+}
+
+}  // namespace
+
+Json::Value Describe(const store::Mark& mark) {
+    Json::Value json;
+    json["id"] = mark.id;
+    json["kind"] = mark.kind == store::MarkKind::kAlert ? "alert" : "pos";
+    json["camera_id"] = mark.camera_id;
+    json["time"] = Json::Int64{mark.moment_s};
+    json["start"] = Json::Int64{mark.start_s};
+    json["stop"] = Json::Int64{mark.end_s};
+    json["state"] = store::NameOf(mark.state);
+    json["reported_by"] = mark.reporter.name;
+    json["text"] = LinesOf(mark.text);
+    return json;
+}
+
+// With the same member names as the search of recorded events.
+Json::Value Describe(const store::Event& event) {
+    Json::Value json;
+    json["id"] = event.id;
+    json["kind"] = "event";
+    json["camera_id"] = event.camera_id;
+    json["start"] = Json::Int64{event.start_s};
+    json["stop"] = Json::Int64{event.end_s};
+    json["frame_count"] = event.frame_count;
+    json["record_type"] = event.reason;
+    json["is_recording"] = event.recording;
+    json["archived"] = event.archived;
+    return json;
+}
+
+Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark) {
+    Json::Value json = Describe(mark);
+    const std::vector<store::Event> recordings = RecordingsOf(records, mark);
+    json["archived"] = !recordings.empty() && std::ranges::all_of(recordings, &store::Event::archived);
+    return json;
+}
+
+Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event) {
+    Json::Value json = Describe(event);
+    if (const auto keeping = event.archived ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
+        json["note"] = keeping->note;
+        json["kept_by"] = keeping->keeper;
+        json["kept"] = Json::Int64{keeping->kept_s};
+    }
+    return json;
+}
+
+}  // namespace lookhaven::api

@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Recorded events, alerts and POS transactions as VEXO.Event tells them.
+#pragma once
+
+#include <optional>
+
+#include <json/json.h>
+
+#include "standalone/api/call.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/events.h"
+#include "standalone/store/marks.h"
+
+namespace lookhaven::api {
+
+Json::Value Describe(const store::Mark& mark);
+Json::Value Describe(const store::Event& event);
+
+// The same with whether it is kept, and of a recorded event the note and whose it is. A mark is kept when all
+// recordings of its footage are.
+Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark);
+Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event);
+
+// Throws Failure 404 where there is none, or not for the caller.
+template <typename AnyEvent>
+void RequireVisible(const std::optional<AnyEvent>& event) {
+    if (!event || !binding::MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
+        throw Failure(404, "there is no such event");
+    }
+}
+
+}  // namespace lookhaven::api

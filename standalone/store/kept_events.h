@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Events that somebody keeps: retention leaves their footage alone until they are released.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <string>
+
+#include "standalone/store/store.h"
+
+namespace lookhaven::store {
+
+constexpr std::size_t kMaxKeepNoteBytes = 500;
+
+// Why an event is kept, and who says so.
+struct Keeping {
+    std::string note;         // one line, may be empty
+    std::string keeper;       // the account's name at that time; empty for the command line
+    std::int64_t kept_s = 0;  // 0: not known
+
+    friend bool operator==(const Keeping&, const Keeping&) = default;
+};
+
+class KeptEvents {
+  public:
+    // The store must outlive this object.
+    explicit KeptEvents(Store& store) : connection_(store.connection()) {}
+
+    // Of those of the events that exist, growing ones too; one that is kept already gets the new note and keeper. Each
+    // is one transaction and returns how many there were: an event that retention is deleting is not among them. Keep
+    // throws InvalidRecord.
+    int Keep(std::span<const int> event_ids, const Keeping& keeping);
+    int Release(std::span<const int> event_ids);
+
+    // Nothing for an event that is not kept.
+    std::optional<Keeping> Find(int event_id);
+    // What kept events take of the mount.
+    std::int64_t SizeBytes(int mount_id);
+
+  private:
+    Connection& connection_;
+};
+
+}  // namespace lookhaven::store
