@@ -11,6 +11,7 @@ pkg_check_modules(seccomp REQUIRED IMPORTED_TARGET libseccomp)
 pkg_check_modules(sodium REQUIRED IMPORTED_TARGET libsodium)
 pkg_check_modules(turbojpeg REQUIRED IMPORTED_TARGET libturbojpeg)
 pkg_check_modules(libav REQUIRED IMPORTED_TARGET libavformat libavcodec libavutil libswscale libswresample)
+pkg_check_modules(zlib REQUIRED IMPORTED_TARGET zlib)
 find_package(CLI11 REQUIRED)
 
 # Debian's libsoci-dev ships no CMake configuration. The part for PostgreSQL is loaded by its name.

@@ -10,6 +10,7 @@
 #include "platform/recording/eventsearch.h"
 #include "standalone/api/download.h"
 #include "standalone/api/event_json.h"
+#include "standalone/api/export.h"
 #include "standalone/api/footage.h"
 #include "standalone/api/keep.h"
 #include "standalone/base/clock.h"
@@ -230,7 +231,9 @@ constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Effect::kChanges},
                                {"Next", Next},
                                {"Frame", TellFrame},
                                {"Keep", Keep, Method::Effect::kChanges},
-                               {"Download", Download}};
+                               {"Download", Download},
+                               {"PlanExport", PlanExport},
+                               {"Export", Export}};
 
 }  // namespace
 

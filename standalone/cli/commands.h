@@ -17,6 +17,7 @@ void AddLog(CLI::App& program, const Console& console);
 void AddGroup(CLI::App& program, const Console& console);
 void AddMount(CLI::App& program, const Console& console);
 void AddEvent(CLI::App& program, const Console& console);
+void AddExport(CLI::App& program, const Console& console);
 void AddEmap(CLI::App& program, const Console& console);
 void AddDevices(CLI::App& program, const Console& console);
 void AddServer(CLI::App& program, const Console& console);

@@ -14,9 +14,11 @@
 #include <memory>
 #include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 #include <vector>
 
+#include "standalone/media/join.h"
 #include "standalone/media/remux.h"
 
 namespace lookhaven::media {
@@ -61,6 +63,10 @@ class RemuxLibrary {
 
     // As Export in remux.h.
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
+    // As Join and SoundOf in join.h.
+    virtual void Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options,
+                      const ByteSink& sink) const = 0;
+    virtual std::string SoundOf(const std::filesystem::path& recording) const = 0;
 };
 
 // Lets a thread of its own begin to load the decoder library, so that LoadDecoderLibrary waits less. What fails shows

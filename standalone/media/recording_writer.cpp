@@ -13,7 +13,7 @@
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/media/annexb.h"
-#include "standalone/media/matroska_output.h"
+#include "standalone/media/container_output.h"
 #include "standalone/media/source.h"
 
 namespace lookhaven::media {
@@ -76,7 +76,7 @@ RecordingWriter::RecordingWriter(const std::filesystem::path& path, const MediaF
 RecordingWriter::~RecordingWriter() = default;
 
 void RecordingWriter::Create(const std::filesystem::path& path, int reason) {
-    output_ = std::make_unique<MatroskaOutput>(file_.Get(), true);
+    output_ = std::make_unique<ContainerOutput>(file_.Get(), true);
     video_ = output_->AddStream(format_.video);
     audio_ = format_.audio ? output_->AddStream(*format_.audio) : -1;
     output_->SetStart(start_wall_ms_);

@@ -22,7 +22,7 @@
 
 namespace lookhaven::media {
 
-class MatroskaOutput;
+class ContainerOutput;
 
 // The recording cannot be written on: code() is ENOSPC or EDQUOT for a full disk, else what the disk reports.
 class WriteError : public std::system_error {
@@ -78,7 +78,7 @@ class RecordingWriter {
     const MediaFormat format_;
     const std::int64_t start_wall_ms_;
     base::FileDescriptor file_;
-    std::unique_ptr<MatroskaOutput> output_;
+    std::unique_ptr<ContainerOutput> output_;
     int video_ = -1;  // streams of the output
     int audio_ = -1;
     // What Create makes; never empty afterwards.

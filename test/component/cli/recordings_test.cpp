@@ -54,10 +54,27 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
     EXPECT_EQ(plans, "1+ 2+ ");
     EXPECT_THAT(store::Groups(store).Find(1).value().camera_ids, ElementsAre(1, 2));
 
+    const std::string zip = (folder_ / "out.zip").string();
     Play({{"demo footage", 0, "8 events of the last days with 8 alerts"},
           {"demo footage", 0, "0 events"},
           {"verify", 0, "8 events with 4000 frames"},
+          {"export 1 2 --from -4d " + zip, 0, "gaps without footage"},
+          {"export verify " + zip, 0, "were checked"},
+          {"export 1 2 --from -4d " + zip, 73, "already a file"},
+          {"export 1 2 --from -4d " + zip + ".mkv", 64, "ends in .zip"},
+          {"export 1 x --from -4d " + zip + ".mkv", 64, "no camera's number"},
+          {"export 9 --from -4d " + zip + ".mkv", 66, "nothing of these cameras"},
+          {"export 1 --from -4d --to -5d " + zip + ".mkv", 64, "--to must be after"},
+          {"export --from -4d " + zip, 64, "export needs cameras"},
+          {"export verify " + (home_ / "lookhaven.db").string(), 65, "no export"},
+          {"export verify " + zip + ".mkv", 66, "there is no file"},
           {"event list --kind pos --camera 2", 0, "2 x Coffee", "pending"}});
+
+    std::string bytes = base::ReadFile(zip);
+    bytes[bytes.size() / 2] ^= 1;
+    std::ofstream(zip, std::ios::binary) << bytes;
+    Play({{"export verify " + zip, 1, "was changed"}, {"export 1 --from -1d - >" + zip + ".mkv", 0, ""}});
+    EXPECT_THAT(test::Probe(zip + ".mkv"), testing::StartsWith("mjpeg,"));
 
     // A second set-up takes nothing back, and lowers no limit under which there may be recordings.
     Play({{"mount set 1 --limit 900G", 0, "Changed"},

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/media/matroska_output.h"
+#include "standalone/media/container_output.h"
 
 #include <algorithm>
 #include <array>
@@ -7,6 +7,7 @@
 #include <cstring>
 #include <limits>
 #include <system_error>
+#include <utility>
 
 #include <unistd.h>
 
@@ -69,17 +70,28 @@ void SetExtraData(AVCodecParameters& parameters, const std::vector<std::uint8_t>
 
 }  // namespace
 
-void MatroskaOutput::FreeIo::operator()(AVIOContext* io) const {
+void ContainerOutput::FreeIo::operator()(AVIOContext* io) const {
     av_freep(&io->buffer);
     avio_context_free(&io);
 }
 
-MatroskaOutput::MatroskaOutput(int descriptor, bool seekable) : descriptor_(descriptor) {
+ContainerOutput::ContainerOutput(int descriptor, bool seekable)
+    : ContainerOutput([descriptor](auto bytes) { return base::WriteAll(descriptor, bytes.data(), bytes.size()); },
+                      descriptor, seekable, Container::kMatroska) {}
+
+ContainerOutput::ContainerOutput(ByteSink sink, Container container)
+    : ContainerOutput(std::move(sink), -1, false, container) {}
+
+ContainerOutput::ContainerOutput(ByteSink sink, int descriptor, bool seekable, Container container)
+    : descriptor_(descriptor),
+      sink_(std::move(sink)),
+      container_(container) {
     PrepareAv();
     auto* buffer = static_cast<std::uint8_t*>(av_malloc(kBufferBytes));
     io_.reset(avio_alloc_context(buffer, kBufferBytes, 1, this, nullptr, WriteBytes, seekable ? Seek : nullptr));
     AVFormatContext* context = nullptr;
-    CheckAv(avformat_alloc_output_context2(&context, nullptr, "matroska", nullptr), "needs libavformat with Matroska");
+    const char* name = container == Container::kMp4 ? "mp4" : "matroska";
+    CheckAv(avformat_alloc_output_context2(&context, nullptr, name, nullptr), "libavformat lacks a container");
     context_.reset(context);
     if (io_ == nullptr) {
         av_free(buffer);
@@ -90,9 +102,9 @@ MatroskaOutput::MatroskaOutput(int descriptor, bool seekable) : descriptor_(desc
     packet_ = OwnAv(av_packet_alloc());
 }
 
-int MatroskaOutput::WriteBytes(void* self, std::uint8_t* data, int size) {
-    auto& output = *static_cast<MatroskaOutput*>(self);
-    if (!base::WriteAll(output.descriptor_, data, static_cast<std::size_t>(size))) {
+int ContainerOutput::WriteBytes(void* self, std::uint8_t* data, int size) {
+    auto& output = *static_cast<ContainerOutput*>(self);
+    if (!output.sink_({data, static_cast<std::size_t>(size)})) {
         output.errno_ = output.errno_ == 0 ? errno : output.errno_;
         return AVERROR(output.errno_);
     }
@@ -100,15 +112,15 @@ int MatroskaOutput::WriteBytes(void* self, std::uint8_t* data, int size) {
     return size;
 }
 
-std::int64_t MatroskaOutput::Seek(void* self, std::int64_t offset, int whence) {
+std::int64_t ContainerOutput::Seek(void* self, std::int64_t offset, int whence) {
     if (whence == AVSEEK_SIZE) {
         return AVERROR(ENOSYS);
     }
-    const off_t position = ::lseek(static_cast<MatroskaOutput*>(self)->descriptor_, offset, whence);
+    const off_t position = ::lseek(static_cast<ContainerOutput*>(self)->descriptor_, offset, whence);
     return position < 0 ? AVERROR(errno) : position;
 }
 
-void MatroskaOutput::Check(int result, const char* what) const {
+void ContainerOutput::Check(int result, const char* what) const {
     const int failure = errno_ != 0 ? errno_ : io_->error < 0 ? EIO : 0;
     if (failure != 0) {
         throw std::system_error(failure, std::generic_category(), what);
@@ -116,7 +128,7 @@ void MatroskaOutput::Check(int result, const char* what) const {
     CheckAv(result, what);
 }
 
-AVStream& MatroskaOutput::NewStream() {
+AVStream& ContainerOutput::NewStream() {
     AVStream* stream = avformat_new_stream(context_.get(), nullptr);
     if (stream == nullptr) {
         throw std::bad_alloc();
@@ -126,7 +138,7 @@ AVStream& MatroskaOutput::NewStream() {
     return *stream;
 }
 
-int MatroskaOutput::AddStream(const StreamFormat& format) {
+int ContainerOutput::AddStream(const StreamFormat& format) {
     AVStream& stream = NewStream();
     AVCodecParameters& parameters = *stream.codecpar;
     const bool is_video = format.width > 0;
@@ -145,35 +157,50 @@ int MatroskaOutput::AddStream(const StreamFormat& format) {
     return stream.index;
 }
 
-int MatroskaOutput::AddStream(const AVCodecParameters& parameters) {
+int ContainerOutput::AddStream(const AVCodecParameters& parameters) {
     AVStream& stream = NewStream();
     CheckAv(avcodec_parameters_copy(stream.codecpar, &parameters), "cannot copy a stream");
-    stream.codecpar->codec_tag = 0;
+    // Apple's players take no other tag for H.265.
+    const bool is_h265_in_mp4 = container_ == Container::kMp4 && parameters.codec_id == AV_CODEC_ID_HEVC;
+    stream.codecpar->codec_tag = is_h265_in_mp4 ? MKTAG('h', 'v', 'c', '1') : 0;
     return stream.index;
 }
 
-void MatroskaOutput::SetStart(std::int64_t wall_ms) {
+void ContainerOutput::SetStart(std::int64_t wall_ms) {
     av_dict_set(&context_->metadata, "creation_time", base::FormatUtc(wall_ms).c_str(), 0);
 }
 
-void MatroskaOutput::Begin() {
+void ContainerOutput::Begin() {
     AvOptions options;
-    // Neither our readers nor players look at checksums, and each byte of footage would go through them.
-    options.Set("cluster_time_limit", "1000").Set("write_crc32", "0");
+    if (container_ == Container::kMp4) {
+        options.Set("movflags", "frag_custom+empty_moov+default_base_moof");
+    } else {
+        // Neither our readers nor players look at checksums, and each byte of footage would go through them.
+        options.Set("cluster_time_limit", "1000").Set("write_crc32", "0");
+    }
     Check(avformat_write_header(context_.get(), options.Get()), "cannot write a recording's head");
     avio_flush(io_.get());
     Check(0, "cannot write a recording's head");
 }
 
-void MatroskaOutput::Write(int stream, std::span<const std::uint8_t> data, std::int64_t time_ms, bool key_frame) {
+void ContainerOutput::Write(int stream, std::span<const std::uint8_t> data, std::int64_t time_ms, bool key_frame) {
     // The muxer requires decoding times that never decrease and are not after presentation times; it stores none of
     // them.
+    const std::int64_t decode_ms =
+        std::max(decode_ms_.at(static_cast<std::size_t>(stream)), time_ms - kMaxReorderingMs);
+    Write(stream, data, {.presentation_ms = time_ms, .decoding_ms = decode_ms}, key_frame);
+}
+
+void ContainerOutput::Write(int stream, std::span<const std::uint8_t> data, const FrameTimes& times, bool key_frame) {
     std::int64_t& decode_ms = decode_ms_.at(static_cast<std::size_t>(stream));
-    decode_ms = std::max(decode_ms, time_ms - kMaxReorderingMs);
+    decode_ms = times.decoding_ms;
     packet_->data = const_cast<std::uint8_t*>(data.data());
     packet_->size = static_cast<int>(data.size());
-    packet_->pts = std::max(time_ms, decode_ms);
+    packet_->pts = std::max(times.presentation_ms, decode_ms);
     packet_->dts = decode_ms;
+    packet_->duration = times.duration_ms;
+    // The muxer of MP4 has finer units.
+    av_packet_rescale_ts(packet_.get(), {1, 1000}, context_->streams[stream]->time_base);
     packet_->stream_index = stream;
     packet_->flags = key_frame ? AV_PKT_FLAG_KEY : 0;
     const int result = av_write_frame(context_.get(), packet_.get());
@@ -182,13 +209,13 @@ void MatroskaOutput::Write(int stream, std::span<const std::uint8_t> data, std::
     Check(result, "cannot write a recording");
 }
 
-void MatroskaOutput::Flush() {
+void ContainerOutput::Flush() {
     const int result = av_write_frame(context_.get(), nullptr);
     avio_flush(io_.get());
     Check(result, "cannot write a recording");
 }
 
-void MatroskaOutput::End() {
+void ContainerOutput::End() {
     const int result = av_write_trailer(context_.get());
     avio_flush(io_.get());
     Check(result, "cannot finish a recording");

@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the answers that are files to keep have in common.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "standalone/api/call.h"
+
+namespace lookhaven::api {
+
+// The client's zone in minutes east of UTC; 0 when the parameter "utc_offset_min" is missing. Throws Failure 400.
+int UtcOffset(const Call& call);
+
+// Writes the head of an answer of that size to standard output. name: the file's, in UTF-8.
+void SendAttachmentHead(const std::string& content_type, const std::string& name, std::int64_t size_bytes);
+
+}  // namespace lookhaven::api

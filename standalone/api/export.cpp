@@ -1,0 +1,143 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/export.h"
+
+#include <algorithm>
+#include <list>
+#include <map>
+#include <set>
+#include <string>
+#include <system_error>
+#include <utility>
+
+#include <unistd.h>
+
+#include "platform/recording/eventsearch.h"
+#include "standalone/api/attachment.h"
+#include "standalone/api/decoder_sandbox.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/io.h"
+#include "standalone/binding/rights.h"
+#include "standalone/control/flush_request.h"
+#include "standalone/evidence/manifest.h"
+#include "standalone/evidence/write.h"
+#include "standalone/media/libav_libraries.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::size_t kMaxCameras = 16;
+constexpr std::int64_t kMaxSpanSeconds = 86'400;
+constexpr std::int64_t kMaxBytes = std::int64_t{256} << 30;
+
+std::set<int> CamerasOf(const Call& call) {
+    const std::list<int> numbers = String2IntList(call.Parameter("cameralists").asString(), ",");
+    std::set<int> ids(numbers.begin(), numbers.end());
+    if (ids.empty() || ids.size() > kMaxCameras) {
+        throw Failure(400, "cameralists names 1 to " + std::to_string(kMaxCameras) + " cameras");
+    }
+    return ids;
+}
+
+archive::TimeSpan SpanOf(const Call& call, std::int64_t now_s) {
+    const std::int64_t from_s = call.NumberOr("from", 0);
+    const std::int64_t to_s = call.NumberOr("to", now_s);
+    if (from_s < 1 || to_s > now_s + kMaxSpanSeconds || to_s <= from_s || to_s - from_s > kMaxSpanSeconds) {
+        throw Failure(400, "from and to are at most a day apart, and not far ahead");
+    }
+    return {from_s * 1000, to_s * 1000};
+}
+
+// The camera's recordings; asks the recorder for the latest of one that grows.
+evidence::CameraFootage FootageOf(const Call& call, int id, const archive::TimeSpan& span,
+                                  const std::map<int, std::string>& mounts) {
+    const auto camera = store::Cameras(call.Records()).Find(id);
+    const std::vector<store::Event> events =
+        store::Events(call.Records())
+            .List({.camera_ids = {id}, .begin_s = span.begin_ms / 1000, .end_s = span.end_ms / 1000});
+    if (!binding::MayUse(id, store::CameraAccess::kPlayback) || (!camera && events.empty())) {
+        throw Failure(404, kNoSuchCamera);
+    }
+    evidence::CameraFootage footage{.id = id, .name = camera ? camera->name : "Camera " + std::to_string(id)};
+    footage.with_sound = binding::MayUse(id, store::CameraAccess::kAudio);
+    for (const store::Event& event : events) {
+        const auto mount = mounts.find(event.mount_id);
+        if (event.demo || mount == mounts.end()) {
+            continue;
+        }
+        footage.recordings.push_back(std::filesystem::path(mount->second) / event.path);
+        if (event.recording && span.end_ms >= event.end_s * 1000) {
+            control::FlushRequests(call.context.Installation()).Ask(event.id);
+        }
+    }
+    return footage;
+}
+
+evidence::Request RequestOf(const Call& call) {
+    const std::int64_t now_s = base::WallSeconds();
+    const std::set<int> ids = CamerasOf(call);
+    evidence::Request request{.span = SpanOf(call, now_s), .now_ms = now_s * 1000};
+    request.utc_offset_min = UtcOffset(call);
+    request.names_in_utc = call.Parameter("utc_offset_min").isNull();
+    request.as_archive = !call.Parameter("archive").isNull() && call.Parameter("archive").asBool();
+    const auto user = store::Users(call.Records()).Find(static_cast<int>(call.context.Caller()));
+    request.exporter = user ? user->name : "";
+    std::map<int, std::string> mounts;
+    for (const store::Mount& mount : store::Mounts(call.Records()).List()) {
+        mounts.emplace(mount.id, mount.path);
+    }
+    for (const int id : ids) {
+        request.cameras.push_back(FootageOf(call, id, request.span, mounts));
+    }
+    return request;
+}
+
+// Confines the process: what reads on from here has been sent by a camera.
+evidence::Plan PlanOf(const Call& call, const media::RemuxLibrary& remux) {
+    evidence::Request request = RequestOf(call);
+    call.context.CloseRecords();
+    call.slots.KeepOnly(call.slot);
+    const base::Installation& installation = call.context.Installation();
+    EnterPlaybackSandbox(installation, PlaybackFilter(installation.StoreUrl()));
+    evidence::Plan plan = evidence::MakePlan(std::move(request), remux);
+    if (std::ranges::all_of(plan.cameras, [](const auto& camera) { return camera.files.empty(); })) {
+        throw Failure(404, "nothing of that time is recorded");
+    }
+    if (plan.size_bytes > kMaxBytes) {
+        throw Failure(400, "this is more than can be exported at once");
+    }
+    return plan;
+}
+
+}  // namespace
+
+std::string PlanExport(const Call& call) {
+    const evidence::Plan plan = PlanOf(call, media::LoadRemuxLibrary());
+    Json::Value data;
+    data["name"] = plan.name;
+    data["size_bytes"] = Json::Int64{plan.size_bytes};
+    data["camera"] = evidence::CamerasOf(plan);
+    return SuccessAnswer(data);
+}
+
+std::string Export(const Call& call) {
+    call.context.NoteStream();
+    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    const evidence::Plan plan = PlanOf(call, remux);
+    SendAttachmentHead(plan.content_type, plan.name, plan.size_bytes);
+    try {
+        evidence::Write(plan, remux,
+                        [](auto bytes) { return base::WriteAll(STDOUT_FILENO, bytes.data(), bytes.size()); });
+    } catch (const std::system_error& error) {
+        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
+            throw;
+        }  // else the client has gone, which is no failure
+    }
+    return "";
+}
+
+}  // namespace lookhaven::api

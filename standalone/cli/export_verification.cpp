@@ -1,0 +1,137 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/cli/export_verification.h"
+
+#include <array>
+#include <map>
+#include <memory>
+#include <sstream>
+
+#include <archive.h>
+#include <archive_entry.h>
+#include <sodium.h>
+#include <unistd.h>
+
+#include "standalone/cli/console.h"
+#include "standalone/evidence/manifest.h"
+
+namespace lookhaven::cli {
+
+namespace {
+
+constexpr std::size_t kBlockBytes = 1 << 16;
+constexpr std::size_t kMaxManifestBytes = 64 << 20;
+
+struct Member {
+    std::string sha256;
+    std::string text;  // of the manifest
+};
+
+struct FreeArchive {
+    void operator()(struct archive* opened) const { archive_read_free(opened); }
+};
+
+class Zip {
+  public:
+    explicit Zip(const std::string& file) : file_(file), archive_(archive_read_new()) {
+        archive_read_support_format_zip_seekable(archive_.get());
+        archive_read_set_format_option(archive_.get(), "zip", "ignorecrc32", "1");  // the hashes say which file it is
+        Require(archive_read_open_filename(archive_.get(), file.c_str(), kBlockBytes));
+    }
+
+    std::map<std::string, Member> ReadAll() {
+        std::map<std::string, Member> members;
+        archive_entry* entry = nullptr;
+        for (int result = 0; (result = archive_read_next_header(archive_.get(), &entry)) != ARCHIVE_EOF;) {
+            Require(result);
+            const char* name = archive_entry_pathname_utf8(entry);
+            const std::string known = name == nullptr ? "" : name;
+            if (!members.emplace(known, ReadMember(known == evidence::kManifestName)).second) {
+                throw Failure(kDataError, file_, " has two files of one name");
+            }
+        }
+        return members;
+    }
+
+  private:
+    // A warning, as of a name that the locale cannot show, is none of ours.
+    void Require(int result) const {
+        if (result < ARCHIVE_WARN) {
+            throw Failure(kDataError, file_, " is no export, or is cut: ", archive_error_string(archive_.get()));
+        }
+    }
+
+    Member ReadMember(bool keeps_text) {
+        crypto_hash_sha256_state state;
+        crypto_hash_sha256_init(&state);
+        std::array<unsigned char, kBlockBytes> block{};
+        Member member;
+        while (true) {
+            const la_ssize_t got = archive_read_data(archive_.get(), block.data(), block.size());
+            Require(got < 0 ? static_cast<int>(got) : ARCHIVE_OK);
+            if (got <= 0) {
+                break;
+            }
+            const auto size = static_cast<std::size_t>(got);
+            crypto_hash_sha256_update(&state, block.data(), size);
+            if (keeps_text && member.text.size() + size <= kMaxManifestBytes) {
+                member.text.append(reinterpret_cast<const char*>(block.data()), size);
+            }
+        }
+        std::array<unsigned char, crypto_hash_sha256_BYTES> hash{};
+        crypto_hash_sha256_final(&state, hash.data());
+        std::array<char, evidence::kHashCharacters + 1> text{};
+        member.sha256 = sodium_bin2hex(text.data(), text.size(), hash.data(), hash.size());
+        return member;
+    }
+
+    std::string file_;
+    std::unique_ptr<struct archive, FreeArchive> archive_;
+};
+
+// The hashes by the files' names.
+std::map<std::string, std::string> HashesOf(const std::string& file, const std::string& manifest) try {
+    Json::Value json;
+    std::istringstream(manifest) >> json;
+    if (json["format"] != evidence::kManifestFormat) {
+        throw Failure(kDataError, file, " has a list of another format");
+    }
+    std::map<std::string, std::string> hashes;
+    for (const Json::Value& camera : json["camera"]) {
+        for (const Json::Value& each : camera["file"]) {
+            hashes.emplace(each["name"].asString(), each["sha256"].asString());
+        }
+    }
+    return hashes;
+} catch (const Json::Exception&) {
+    throw Failure(kDataError, "the list in ", file, " is damaged");
+}
+
+}  // namespace
+
+ExportVerification VerifyExport(const std::string& file) {
+    if (::access(file.c_str(), R_OK) != 0) {
+        throw Failure(kNoInput, "there is no file ", file, ", or it cannot be read");
+    }
+    std::map<std::string, Member> members = Zip(file).ReadAll();
+    const auto manifest = members.extract(evidence::kManifestName);
+    if (manifest.empty()) {
+        throw Failure(kDataError, file, " has no ", evidence::kManifestName, ", so it is no export");
+    }
+    ExportVerification verification;
+    for (const auto& [name, sha256] : HashesOf(file, manifest.mapped().text)) {
+        const auto member = members.extract(name);
+        if (member.empty()) {
+            verification.faults.push_back(name + " is missing");
+        } else if (member.mapped().sha256 != sha256) {
+            verification.faults.push_back(name + " was changed");
+        } else {
+            ++verification.files;
+        }
+    }
+    for (const auto& [name, member] : members) {
+        verification.faults.push_back(name + " was added");
+    }
+    return verification;
+}
+
+}  // namespace lookhaven::cli

@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Compares an exported ZIP file with the hashes that it carries.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace lookhaven::cli {
+
+struct ExportVerification {
+    int files = 0;                    // that are as the list says
+    std::vector<std::string> faults;  // a sentence each
+};
+
+// Throws Failure when there is no file, or one that is no export at all or cut.
+ExportVerification VerifyExport(const std::string& file);
+
+}  // namespace lookhaven::cli

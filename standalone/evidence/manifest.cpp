@@ -1,0 +1,94 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/evidence/manifest.h"
+
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+
+#include <unistd.h>
+
+#include "standalone/base/clock.h"
+
+namespace lookhaven::evidence {
+
+namespace {
+
+Json::Value MomentOf(const Plan& plan, std::int64_t wall_ms) {
+    Json::Value moment;
+    moment["utc"] = base::FormatUtc(wall_ms);
+    moment["local"] = LocalTime(wall_ms, plan.request.utc_offset_min);
+    return moment;
+}
+
+Json::Value Describe(const Plan& plan, const File& file) {
+    const archive::IndexHeader& format = file.parts.front().header;
+    Json::Value json;
+    json["name"] = file.name;
+    json["size_bytes"] = Json::Int64{file.size_bytes};
+    json["video"] = format.codec;
+    json["sound"] = file.HasSound() ? format.audio_codec : "";
+    json["first_frame"] = MomentOf(plan, file.parts.front().FirstWallMs());
+    json["last_frame"] = MomentOf(plan, file.parts.back().LastWallMs());
+    return json;
+}
+
+std::string HostName() {
+    std::array<char, 256> name{};
+    return ::gethostname(name.data(), name.size() - 1) == 0 ? name.data() : "";
+}
+
+}  // namespace
+
+Json::Value CamerasOf(const Plan& plan) {
+    Json::Value cameras(Json::arrayValue);
+    for (const Camera& camera : plan.cameras) {
+        Json::Value json;
+        json["id"] = camera.id;
+        json["name"] = camera.name;
+        json["file"] = Json::arrayValue;
+        for (const File& file : camera.files) {
+            json["file"].append(Describe(plan, file));
+        }
+        json["gap"] = Json::arrayValue;
+        for (const archive::TimeSpan& gap : camera.gaps) {
+            Json::Value each;
+            each["begin"] = MomentOf(plan, gap.begin_ms);
+            each["end"] = MomentOf(plan, gap.end_ms);
+            json["gap"].append(each);
+        }
+        cameras.append(json);
+    }
+    return cameras;
+}
+
+std::string ManifestOf(const Plan& plan, std::span<const std::string> hashes) {
+    Json::Value json;
+    json["format"] = kManifestFormat;
+    json["exported"] = MomentOf(plan, plan.request.now_ms);
+    json["exported"]["by"] = plan.request.exporter;
+    json["exported"]["host"] = HostName();
+    json["begin"] = MomentOf(plan, plan.request.span.begin_ms);
+    json["end"] = MomentOf(plan, plan.request.span.end_ms);
+    json["camera"] = CamerasOf(plan);
+    std::size_t next = 0;
+    for (Json::Value& camera : json["camera"]) {
+        for (Json::Value& file : camera["file"]) {
+            file["sha256"] = hashes[next++];
+        }
+    }
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "  ";
+    builder["emitUTF8"] = true;
+    return Json::writeString(builder, json) + '\n';
+}
+
+std::string LocalTime(std::int64_t wall_ms, int utc_offset_min) {
+    std::array<char, 16> zone{};
+    const int minutes = std::abs(utc_offset_min);
+    std::snprintf(zone.data(), zone.size(), "%c%02d:%02d", utc_offset_min < 0 ? '-' : '+', minutes / 60, minutes % 60);
+    std::string time = base::FormatUtc(wall_ms + std::int64_t{60'000} * utc_offset_min);
+    time.pop_back();  // the Z
+    return time + zone.data();
+}
+
+}  // namespace lookhaven::evidence

@@ -1,0 +1,169 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Exports as others read them: ffprobe, Python's zipfile and sha256sum.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "standalone/base/file.h"
+#include "standalone/base/io.h"
+#include "standalone/evidence/manifest.h"
+#include "standalone/evidence/write.h"
+#include "standalone/evidence/zip_writer.h"
+#include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
+
+namespace lookhaven::test {
+namespace {
+
+using namespace evidence;
+using testing::HasSubstr;
+using testing::MatchesRegex;
+
+constexpr std::int64_t kStartMs = 1'772'352'930'000;  // 2026-03-01T08:15:30Z
+
+class Evidence : public testing::Test {
+  protected:
+    std::filesystem::path Footage(const char* name, std::int64_t after_ms, const char* video,
+                                  const char* audio = "") const {
+        const std::filesystem::path path = folder_ / "2026-03-01" / name;
+        Record(MakeClip(video, audio), path, true, SIZE_MAX, kStartMs + after_ms);
+        return path;
+    }
+
+    // Writes it, and finds it as large as announced.
+    std::filesystem::path Export(const Request& request) {
+        const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+        plan_ = MakePlan(request, remux);
+        const std::filesystem::path out = folder_ / plan_.name;
+        const base::FileDescriptor file = base::OpenFile(out, O_WRONLY | O_CREAT | O_TRUNC);
+        evidence::Write(plan_, remux,
+                        [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); });
+        EXPECT_EQ(static_cast<std::int64_t>(std::filesystem::file_size(out)), plan_.size_bytes);
+        return out;
+    }
+
+    static Request Ask(std::vector<CameraFootage> cameras, std::int64_t begin_ms, std::int64_t end_ms) {
+        return {.cameras = std::move(cameras),
+                .span = {kStartMs + begin_ms, kStartMs + end_ms},
+                .exporter = "admin",
+                .now_ms = kStartMs + 86'400'000,
+                .utc_offset_min = 60};
+    }
+
+    static std::string Quoted(const std::filesystem::path& path) { return "'" + path.string() + "'"; }
+
+    ArchiveFolder folder_;
+    Plan plan_;
+};
+
+TEST_F(Evidence, OneCameraBecomesOneFileInWhichItsRecordingsFollowEachOther) {
+    const struct {
+        const char* video;
+        const char* audio;
+        bool with_sound;
+        const char* name;
+        const char* probed;
+    } rows[] = {
+        {kH264, "-c:a aac -ar 16000", true, "Yard_ 2026-03-01 09.15.31.mp4", "h264,163\naac,[0-9]+\n"},
+        {kH264, "-c:a aac -ar 16000", false, "Yard_ 2026-03-01 09.15.31.mp4", "h264,163\n"},
+        {kH264, "-c:a pcm_mulaw -ar 8000", true, "Yard_ 2026-03-01 09.15.31.mkv", "h264,163\npcm_mulaw,[0-9]+\n"},
+        {kH264Reordered, "", true, "Yard_ 2026-03-01 09.15.31.mp4", "h264,16[0-9]\n"},
+        {kH265, "", true, "Yard_ 2026-03-01 09.15.31.mp4", "hevc,16[0-9]\n"},
+        {kMjpeg, "", true, "Yard_ 2026-03-01 09.15.31.mkv", "mjpeg,15[0-9]\n"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.probed);
+        std::filesystem::remove_all(folder_ / "2026-03-01");
+        const auto first = Footage("081530-1.mkv", 0, row.video, row.audio);
+        const auto second = Footage("081540-2.mkv", 10'000, row.video, row.audio);
+        const auto gone = folder_ / "2026-03-01/081550-3.mkv";
+        const auto out = Export(Ask({{1, "Yard?", row.with_sound, {first, second, gone}}}, 1500, 13'500));
+        EXPECT_EQ(plan_.name, row.name);
+        EXPECT_THAT(Probe(Quoted(out)), MatchesRegex(row.probed));
+        // The gap stays in the file, and times go by the clock.
+        EXPECT_THAT(
+            Shell("ffprobe -v error -select_streams v -show_entries packet=pts_time -of csv=p=0 " + Quoted(out) +
+                  " | sort -n | awk -F, 'NR == 1 {first = $1} NR > 1 && $1 - last > 1 {print \"gap of\", $1 - last}"
+                  " {last = $1} END {print \"length\", last - first}'"),
+            MatchesRegex("gap of 6.04\nlength 12(.48|.52)?\n"));
+        ASSERT_EQ(plan_.cameras[0].gaps.size(), 1U);
+        EXPECT_EQ(plan_.cameras[0].gaps[0], (archive::TimeSpan{kStartMs + 3960, kStartMs + 10'000}));
+    }
+}
+
+TEST_F(Evidence, SeveralBecomeAnArchiveWhoseListIsTrue) {
+    const auto silent = Footage("081530-1.mkv", 0, kH264);
+    const auto loud = Footage("081534-2.mkv", 4000, kH264, "-c:a aac -ar 16000");
+    const auto other = Footage("081530-3.mkv", 0, kMjpeg);
+    const auto later = Footage("101530-4.mkv", 7'200'000, kMjpeg);
+    const auto out = Export(Ask(
+        {{1, "Yard", true, {silent, loud}}, {2, "Gäte", true, {other, later}}, {3, "Shed", true, {}}}, 0, 7'204'000));
+    EXPECT_EQ(plan_.content_type, std::string("application/zip"));
+    // Unpacks into the folder, and compares sizes and checksums by itself.
+    EXPECT_EQ(Shell("cd " + Quoted(folder_.Path()) +
+                    " && python3 -c \"import zipfile, sys; z = zipfile.ZipFile(sys.argv[1]);"
+                    " print(z.testzip(), len(z.namelist())); z.extractall()\" " +
+                    Quoted(out)),
+              "None 5\n");
+    Json::Value manifest;
+    std::istringstream(Contents(folder_ / kManifestName)) >> manifest;
+    EXPECT_EQ(manifest["exported"]["by"], "admin");
+    EXPECT_EQ(manifest["camera"][1]["name"], "Gäte");
+    EXPECT_EQ(manifest["camera"][1]["gap"][0]["begin"]["utc"], "2026-03-01T08:15:33.960Z");
+    EXPECT_EQ(manifest["camera"][2]["gap"][0]["end"]["local"], "2026-03-01T11:15:34.000+01:00");
+    EXPECT_EQ(manifest["camera"][0]["file"][1]["first_frame"]["local"], "2026-03-01T09:15:34.000+01:00");
+    EXPECT_EQ(manifest["camera"][0]["file"][1]["last_frame"]["utc"], "2026-03-01T08:15:37.960Z");
+    std::string probed;
+    for (const Json::Value& camera : manifest["camera"]) {
+        for (const Json::Value& file : camera["file"]) {
+            const std::filesystem::path path = folder_ / file["name"].asString();
+            EXPECT_EQ(Shell("sha256sum <" + Quoted(path)), file["sha256"].asString() + "  -\n");
+            probed += Probe(Quoted(path)) + file["sound"].asString() + ' ';
+        }
+    }
+    EXPECT_THAT(probed, MatchesRegex("h264,100\n h264,100\naac,[0-9]+\nAAC mjpeg,100\n mjpeg,100\n "));
+}
+
+TEST_F(Evidence, WhatIsCutOrCannotBeTakenThrows) {
+    const auto first = Footage("081530-1.mkv", 0, kH264);
+    const auto second = Footage("081534-2.mkv", 4000, kH264);
+    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    const Plan plan = MakePlan(Ask({{1, "Yard", true, {first, second}}}, 0, 8000), remux);
+    std::int64_t taken = 0;
+    EXPECT_THROW(evidence::Write(plan, remux, [&](auto) { return errno = EPIPE, false; }), std::system_error);
+    std::filesystem::remove(second);
+    EXPECT_THROW(evidence::Write(plan, remux, [&](auto bytes) { return taken += std::ssize(bytes), true; }),
+                 std::system_error);
+    EXPECT_LT(taken, plan.size_bytes);
+    Write(first, "damaged");
+    EXPECT_TRUE(MakePlan(Ask({{1, "Yard", true, {first, second}}}, 0, 8000), remux).cameras[0].files.empty());
+}
+
+TEST_F(Evidence, ArchivesMayBeLargerThan4GiB) {
+    const std::filesystem::path out = folder_ / "large.zip";
+    const base::FileDescriptor file = base::OpenFile(out, O_WRONLY | O_CREAT);
+    const ZipWriter* writer = nullptr;
+    const auto at_its_place = [&](std::span<const std::uint8_t> bytes) {
+        return base::WriteAllAt(file.Get(), bytes.data(), bytes.size(), static_cast<std::uint64_t>(writer->Position()));
+    };
+    ZipWriter zip(at_its_place, kStartMs);
+    writer = &zip;
+    zip.Skip("hole", std::int64_t{5} << 30);
+    const std::string text = "behind it";
+    zip.BeginFile("small", std::ssize(text));
+    for (const char& c : text) {
+        zip.WriteData({reinterpret_cast<const std::uint8_t*>(&c), 1});
+    }
+    zip.EndFile();
+    zip.End();
+    EXPECT_EQ(Shell("python3 -c \"import zipfile, sys; z = zipfile.ZipFile(sys.argv[1]);"
+                    " print(z.getinfo('hole').file_size, z.read('small'), z.getinfo('small').date_time)\" " +
+                    Quoted(out)),
+              "5368709120 b'behind it' (2026, 3, 1, 8, 15, 30)\n");
+}
+
+}  // namespace
+}  // namespace lookhaven::test
