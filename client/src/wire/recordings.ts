@@ -75,6 +75,14 @@ export interface FrameStart {
   from?: number;
 }
 
+/** What an export will be. */
+export interface ExportPlan {
+  sizeBytes: number;
+  files: number;
+  /** Of the cameras that were not recorded all the time, how much there is not. */
+  missing: { camera: string; seconds: number }[];
+}
+
 /** A place in the order of events, and which events are looked for from there. */
 export interface EventPlace {
   cameras: readonly number[];
@@ -118,6 +126,11 @@ interface RawMark {
   reported_by: string;
   text: string[];
   archived?: boolean;
+}
+
+interface RawPlan {
+  size_bytes: number;
+  camera: { name: string; file: unknown[]; gap: { begin: { utc: string }; end: { utc: string } }[] }[];
 }
 
 interface RawHistory {
@@ -282,8 +295,24 @@ export class Recordings {
 
   /** The file is named after its start in this browser's time zone. */
   downloadAddress({ kind, id, start }: Footage): string {
-    const offset = { utc_offset_min: String(-new Date(start * 1000).getTimezoneOffset()) };
-    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind), ...offset });
+    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind), ...zoneAt(start) });
+  }
+
+  /** Rejects with status 404 where nothing of it is recorded. */
+  async planExport(cameras: readonly number[], fromS: number, toS: number): Promise<ExportPlan> {
+    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
+    const { size_bytes, camera } = await this.#server.call<RawPlan>("VEXO.Event", "PlanExport", asked);
+    const missing = camera.map(({ name, gap }) => ({
+      camera: name,
+      seconds: gap.reduce((sum, { begin, end }) => sum + (Date.parse(end.utc) - Date.parse(begin.utc)) / 1000, 0),
+    }));
+    const files = camera.reduce((sum, { file }) => sum + file.length, 0);
+    return { sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
+  }
+
+  exportAddress(cameras: readonly number[], fromS: number, toS: number): string {
+    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
+    return address("VEXO.Event", "Export", { ...asked, ...zoneAt(fromS) });
   }
 }
 
@@ -322,6 +351,11 @@ function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, te
     isKept: archived ?? false,
     ...unknown,
   };
+}
+
+/** This browser's time zone at that time, for names and times in files. */
+function zoneAt(unixS: number): Record<string, string> {
+  return { utc_offset_min: String(-new Date(unixS * 1000).getTimezoneOffset()) };
 }
 
 /** The server takes no kind for a recorded event. */

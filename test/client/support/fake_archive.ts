@@ -81,6 +81,18 @@ export class FakeArchive {
         if (one) one.note = query.get("keep") === "true" ? query.get("note")! : undefined;
         return json({ event: [] });
       }
+      case "VEXO.Event PlanExport": {
+        const [from, to] = [number("from"), number("to")];
+        const camera = idsOf(query).map((id) => {
+          const found = this.#overlapping(id, from, to, false);
+          const utc = (atS: number) => ({ utc: new Date(atS * 1000).toISOString() });
+          const isWhole = found.some(({ stop }) => stop >= to);
+          return { name: `Camera ${id}`, file: found.slice(0, 1), gap: isWhole ? [] : [{ begin: utc(to - 12), end: utc(to) }] };
+        });
+        return camera.every(({ file }) => file.length === 0) ? json(null, 404) : json({ size_bytes: (to - from) * 1e6, camera });
+      }
+      case "VEXO.Event Export":
+        return new Response("file", { headers: { "Content-Disposition": 'attachment; filename="export.zip"' } });
       case "VEXO.Event Next":
         return json({ event: this.#next(query) });
       case "VEXO.Event Frame": {

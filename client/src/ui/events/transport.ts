@@ -20,6 +20,7 @@ export interface TransportActions {
   skip(by: 1 | -1): void;
   rate(rate: number): void;
   now(): void;
+  exportSpan(): void;
   fullScreen(): void;
 }
 
@@ -77,6 +78,7 @@ export class Transport {
       iconButton("now", "Go to now", () => actions.now()),
       keeping.root,
       this.#download,
+      iconButton("export", "Export a span of several cameras", () => actions.exportSpan(), "X"),
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
     );
     this.root = element("div", { class: "transport" }, buttons, about, side);

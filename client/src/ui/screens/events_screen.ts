@@ -14,6 +14,7 @@ import { Calendar } from "../events/calendar";
 import { EventFilter } from "../events/event_filter";
 import { EventList, eventText } from "../events/event_list";
 import { KeepButton } from "../events/keep_button";
+import { ExportPanel } from "../events/export_panel";
 import { Stage } from "../events/stage";
 import { Transport } from "../events/transport";
 import { spanText } from "../timeline/time_scale";
@@ -58,6 +59,7 @@ export class EventsScreen extends Screen {
     (footage, widthPx) => this.#recordings.stillAddress(footage, widthPx),
     (footage) => this.#open(footage),
   );
+  readonly #export = new ExportPanel(this.#recordings, (span) => this.#timeline.chooseSpan(span));
   readonly #stage: Stage;
   readonly #timeline: Timeline;
   readonly #calendar: Calendar;
@@ -65,7 +67,7 @@ export class EventsScreen extends Screen {
   readonly #status = element("p", { class: "bar-status" });
   readonly #body = element("div", { class: "events-body" });
   /** What is shown below the player where there is no room for all of it. */
-  readonly #panels = new Choice("Show", kPanels, "list", (panel) => (this.#body.dataset["panel"] = panel));
+  readonly #panels = new Choice<keyof typeof kPanels>("Show", kPanels, "list", (panel) => (this.#body.dataset["panel"] = panel));
   #cameras: Camera[] = [];
   /** What the address asks for while it is being looked up. */
   #opening = "";
@@ -84,6 +86,7 @@ export class EventsScreen extends Screen {
       scrub: (atMs) => this.#playback.seek(atMs),
       toggle: (camera) => this.#stage.toggle(camera),
       moved: () => this.#onTimelineMoved(),
+      choose: (span) => this.#export.setSpan(span),
     });
     this.#calendar = new Calendar(this.#days, () => this.#chosenCameras(), (dayMs) => this.#pickDay(dayMs));
     const keeping = new KeepButton(this.#recordings, session.account.is_manager, (footage) => this.#onKeepingChanged(footage));
@@ -93,6 +96,7 @@ export class EventsScreen extends Screen {
       skip: (by) => void this.#skip(by),
       rate: (rate) => this.#playback.setRate(rate),
       now: () => this.#timeline.showNow(),
+      exportSpan: () => this.#openExport(),
       fullScreen: toggleFullScreen,
     });
     this.#build(keeping);
@@ -109,6 +113,7 @@ export class EventsScreen extends Screen {
     clearTimeout(this.#settling);
     cancelAnimationFrame(this.#animationFrame);
     this.#playback.close();
+    this.#export.close();
     this.#timeline.close();
     this.#list.close();
   }
@@ -127,6 +132,7 @@ export class EventsScreen extends Screen {
       ["+ -", "On the timeline: show less or more time"],
       ["PageUp PageDown", "On the timeline: earlier or later"],
       ["End", "On the timeline: now"],
+      ["X", "Export a span of several cameras"],
       ["F", "Full screen"],
     ];
   }
@@ -136,6 +142,7 @@ export class EventsScreen extends Screen {
     // From day to day and from row to row, for whoever came there with the keyboard.
     const isWithin = (selector: string) => !hasFocusByPointer() && (event.target as Element).closest(selector) !== null;
     if (event.key.startsWith("Arrow") && isWithin(".calendar-days")) return false;
+    if (event.key.startsWith("Arrow") && (event.target as Element).closest(".span-handle")) return false;
     if (/^Arrow(Up|Down)$/.test(event.key) && isWithin(".list-space")) return false;
     if (event.key === " ") this.#togglePlaying();
     else if (event.key === "ArrowLeft") this.#playback.step(event.shiftKey ? -10 : -1);
@@ -144,6 +151,8 @@ export class EventsScreen extends Screen {
     else if (event.key === "ArrowDown") void this.#skip(1);
     else if (event.key === "[") this.#changeRate(-1);
     else if (event.key === "]") this.#changeRate(1);
+    else if (event.key.toLowerCase() === "x") this.#openExport();
+    else if (event.key === "Escape" && this.#export.isOpen) this.#export.close();
     else if (event.key.toLowerCase() === "f") toggleFullScreen();
     else return false;
     return true;
@@ -163,12 +172,22 @@ export class EventsScreen extends Screen {
       { class: "events-main" },
       this.#stage.root,
       this.#transport.root,
+      this.#export.root,
       this.#panels.root,
       this.#timeline.root,
     );
     this.#body.append(main, side);
     this.addToBar(this.#status);
     this.front.append(this.#body, keeping.dialog);
+  }
+
+  #openExport(): void {
+    if (this.#export.isOpen) return this.#export.close();
+    const atMs = this.#playback.playheadMs ?? Date.now();
+    const footage = this.#playback.lead?.player.footage ?? null;
+    this.#panels.choose("timeline");
+    this.#timeline.reveal(footage ? footage.start * 1000 : atMs);
+    this.#export.open(this.#filter.cameras, this.#stage.cameras, footage, atMs);
   }
 
   #onKeepingChanged(footage: Footage): void {

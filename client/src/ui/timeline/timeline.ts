@@ -10,6 +10,7 @@ import { describe, type Footage, type FootageRef } from "../../wire/recordings";
 import { element } from "../widgets/dom";
 import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
+import { SpanHandles, type Span } from "./span_handles";
 import { TimeScale } from "./time_scale";
 import { coloursOf, kAxisPx, paintAxis, paintGrid, paintLane, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
 import { TimelineHint } from "./timeline_hint";
@@ -30,6 +31,8 @@ export interface TimelineActions {
   toggle(camera: number): void;
   /** Another span is shown. */
   moved(): void;
+  /** A handle of the chosen span was moved. */
+  choose(span: Span): void;
 }
 
 /** Wider than this, single events are neither fetched nor drawn, but the days that have any. */
@@ -62,6 +65,7 @@ export class Timeline {
   readonly #names = element("div", { class: "timeline-names" });
   readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
   readonly #hint = new TimelineHint(this.#drawn);
+  readonly #handles = new SpanHandles(this.#drawn, (span) => this.#actions.choose(span));
   readonly #pointers: PanZoomPointers;
   readonly #resized = new ResizeObserver(() => this.#resize());
   #colours: Colours | null = null;
@@ -136,6 +140,11 @@ export class Timeline {
     this.redraw();
   }
 
+  /** Shows handles at the ends of the span, null for none. */
+  chooseSpan(span: Span | null): void {
+    this.#handles.show(span);
+  }
+
   /** Moves so far that the time is in view. */
   reveal(atMs: number): void {
     if (this.#scale.contains(atMs)) return;
@@ -199,6 +208,7 @@ export class Timeline {
     const colours = this.#colours;
     if (!colours) return;
     const scale = this.#scale;
+    this.#handles.draw(scale);
     const heightPx = this.#canvas.clientHeight;
     const lanePx = heightPx / Math.max(1, this.#lanes.length);
     const font = `${getComputedStyle(this.#names).fontSize} ${getComputedStyle(this.root).fontFamily}`;

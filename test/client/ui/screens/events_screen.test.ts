@@ -165,6 +165,35 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.evaluate(() => localStorage.clear());
   }, 40_000);
 
+  test("a span is chosen by keys, by a handle and by camera; its size is told; it is downloaded", async () => {
+    const page = await opened("#event=21", 1440, 900);
+    await state(page, "playing");
+    await page.evaluate(() => (document.activeElement as HTMLElement).blur());
+    await page.keyboard.press("x");
+    const about = (text: string) => page.locator(".export-about", { hasText: text }).waitFor();
+    await about("5 min · about 300 MB");
+    const end = page.locator(".span-handle[data-end=toMs]");
+    const { x, y, width, height } = (await end.boundingBox())!;
+    await page.mouse.move(x + width / 2, y + height / 2);
+    await page.mouse.down();
+    await page.mouse.move(x + 40, y + height / 2);
+    await page.mouse.up();
+    await page.locator(".export-about", { hasText: "Camera 1 lacks 12 s" }).waitFor();
+    await page.click("button:text-is('This event')");
+    await about("5 min · about 300 MB");
+    await end.focus();
+    await page.keyboard.press("Shift+ArrowLeft");
+    await about("4 min · about 240 MB");
+    await page.locator(".export-panel .chip", { hasText: "Parking" }).click();
+    await about("2 files in a ZIP");
+    const [download] = await Promise.all([page.waitForEvent("download"), page.click(".export-panel a")]);
+    const asked = new URL(download.url()).searchParams;
+    const span = [asked.get("cameralists"), Number(asked.get("from")), Number(asked.get("to"))];
+    expect(span).toEqual(["1,2", noon + 3300, noon + 3540]);
+    await page.keyboard.press("Escape");
+    await end.waitFor({ state: "hidden" });
+  }, 40_000);
+
   test("a phone, too, says that there is nothing only once it knows", async () => {
     const page = await opened("#events", 390, 844);
     const note = await page.waitForFunction(() => document.querySelector(".list-note")?.textContent);
