@@ -197,7 +197,7 @@ class Cameras {
             due = client.plays ? std::min(due, client.DueMicros()) : due;
         }
         const std::int64_t left = std::max<std::int64_t>(due - MonotonicMicros(), 0);
-        const timespec limit{left / 1'000'000, left % 1'000'000 * 1000};
+        const timespec limit{left / 1'000'000, static_cast<long>(left % 1'000'000 * 1000)};
         ::ppoll(waiting.data(), waiting.size(), &limit, nullptr);
         std::size_t place = listeners_.size();
         clients_.remove_if([&](Client& client) { return !Serve(client, waiting[place++].revents); });

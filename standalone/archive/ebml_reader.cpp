@@ -47,7 +47,7 @@ std::span<const std::uint8_t> EbmlReader::Bytes(std::uint64_t at, std::size_t co
         window_.resize(*got);
         window_at_ = at;
     }
-    const std::span<const std::uint8_t> rest = std::span(window_).subspan(at - window_at_);
+    const std::span<const std::uint8_t> rest = std::span(window_).subspan(static_cast<std::size_t>(at - window_at_));
     return rest.first(std::min(count, rest.size()));
 }
 
@@ -69,14 +69,14 @@ std::optional<EbmlReader::Element> EbmlReader::ReadElement(std::uint64_t at, std
 
 std::uint64_t EbmlReader::Unsigned(const Element& element) {
     std::uint64_t number = 0;
-    for (const std::uint8_t byte : Bytes(element.data, std::min<std::uint64_t>(element.Size(), 8))) {
+    for (const std::uint8_t byte : Bytes(element.data, element.SizeUpTo(8))) {
         number = number << 8 | byte;
     }
     return number;
 }
 
 std::string EbmlReader::Text(const Element& element) {
-    const auto bytes = Bytes(element.data, std::min<std::uint64_t>(element.Size(), 64));
+    const auto bytes = Bytes(element.data, element.SizeUpTo(64));
     return {bytes.begin(), std::find(bytes.begin(), bytes.end(), 0)};
 }
 

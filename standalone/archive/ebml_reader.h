@@ -5,6 +5,7 @@
 // Invariants    No contents make this read outside the file, loop forever or allocate without bound.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -36,6 +37,9 @@ class EbmlReader {
         bool is_endless = false;  // of unknown size
 
         std::uint64_t Size() const { return end - data; }
+        std::size_t SizeUpTo(std::size_t max_bytes) const {
+            return static_cast<std::size_t>(std::min<std::uint64_t>(Size(), max_bytes));
+        }
     };
 
     // Borrows the descriptor.

@@ -120,7 +120,7 @@ void MatroskaBlocks::ReadTrack(const Element& track) {
         } else if (element.id == kCodecId) {
             id = ebml_.Text(element);
         } else if (element.id == kCodecPrivate) {
-            const auto bytes = ebml_.Bytes(element.data, std::min<std::uint64_t>(element.Size(), 2));
+            const auto bytes = ebml_.Bytes(element.data, element.SizeUpTo(2));
             private_data.assign(bytes.begin(), bytes.end());
         } else if (element.id == kVideo) {
             ebml_.ForEachChild(element, [&](const Element& side) {
@@ -222,7 +222,7 @@ bool MatroskaBlocks::ReadFrames(const Element& cluster, std::vector<FrameEntry>&
 // True when the block is another track's, or its frame was appended.
 bool MatroskaBlocks::ReadBlock(const Element& block, std::uint64_t cluster_time, bool simple,
                                std::vector<FrameEntry>& frames) {
-    const auto head = ebml_.Bytes(block.data, std::min<std::uint64_t>(block.Size(), 11));
+    const auto head = ebml_.Bytes(block.data, block.SizeUpTo(11));
     const auto track = EbmlNumber::Parse(head, 8);
     if (!track || head.size() < track->length + 3) {
         return false;

@@ -100,7 +100,7 @@ std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::pa
 
 std::string ReadFile(const std::filesystem::path& path, std::size_t max_bytes) {
     const base::FileDescriptor file = OpenFile(path, O_RDONLY);
-    std::string contents(std::min<std::uint64_t>(SizeOf(file, path), max_bytes), '\0');
+    std::string contents(static_cast<std::size_t>(std::min<std::uint64_t>(SizeOf(file, path), max_bytes)), '\0');
     const std::optional<std::size_t> got = base::ReadAll(file.Get(), contents.data(), contents.size());
     if (!got) {
         base::ThrowErrno("cannot read " + path.string());

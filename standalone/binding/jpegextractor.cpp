@@ -33,7 +33,7 @@ constexpr float kMaxRate = 1000.0F;
 
 // False when a signal came first.
 bool SleepUntil(std::int64_t due_us) {
-    const timespec due{due_us / 1'000'000, due_us % 1'000'000 * 1'000};
+    const timespec due{due_us / 1'000'000, static_cast<long>(due_us % 1'000'000 * 1'000)};
     return ::clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &due, nullptr) == 0;
 }
 

@@ -41,7 +41,7 @@ void DelayTimer::Delay() {
     if (MonotonicMicros() - m_DueUs > m_DelayUs) {
         return BeginTiming();  // making up for the lost time would be a burst
     }
-    const timespec due{m_DueUs / 1'000'000, m_DueUs % 1'000'000 * 1'000};
+    const timespec due{m_DueUs / 1'000'000, static_cast<long>(m_DueUs % 1'000'000 * 1'000)};
     ::clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &due, nullptr);
     m_DueUs += m_DelayUs;
 }

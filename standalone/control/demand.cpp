@@ -52,7 +52,7 @@ struct Demand::Table {
 // The stream's slot, else one that it takes over; null when the table is full of valid requests. Two processes at the
 // same time may leave the stream in two slots, which does no harm.
 Slot* Demand::Table::SlotFor(std::uint64_t key, std::int64_t now) {
-    const std::size_t home = (key * 0x9e3779b97f4a7c15ULL) >> 54;
+    const auto home = static_cast<std::size_t>((key * 0x9e3779b97f4a7c15ULL) >> 54);
     Slot* reusable = nullptr;
     std::uint64_t reusable_key = 0;
     for (std::size_t i = 0; i < kSlots; ++i) {

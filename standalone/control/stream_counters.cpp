@@ -84,7 +84,7 @@ std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Instal
     if (!table || (*table)->version != kVersion) {
         return std::nullopt;
     }
-    const std::size_t count = std::min<std::size_t>((*table)->used, kMaxStreams);
+    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>((*table)->used, kMaxStreams));
     std::vector<StreamCounters> streams;
     streams.reserve(count);
     std::transform((*table)->rows.begin(), (*table)->rows.begin() + static_cast<std::ptrdiff_t>(count),

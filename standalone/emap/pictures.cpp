@@ -137,8 +137,7 @@ std::string Pictures::Read(const std::string& name) const {
     const fs::path path = folder_ / name;
     const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
     struct stat about {};
-    if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode) ||
-        static_cast<std::size_t>(about.st_size) > kMaxPictureBytes) {
+    if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode) || about.st_size > off_t{kMaxPictureBytes}) {
         throw std::system_error(EFBIG, std::generic_category(), path.string() + " is no picture file");
     }
     std::string bytes(static_cast<std::size_t>(about.st_size), '\0');

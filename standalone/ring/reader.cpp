@@ -76,7 +76,7 @@ void StartRead(void* ring, Position* position) {
         position->reader = ReaderTable(view).Claim();
         // A stream reads the whole ring over and over. Mapping all its pages now is cheaper than a page fault for every
         // few of them later. Kernels without this call take the page faults.
-        ::madvise(ring, view.Local().real_bytes, MADV_POPULATE_READ);
+        ::madvise(ring, static_cast<std::size_t>(view.Local().real_bytes), MADV_POPULATE_READ);
     }
 }
 

@@ -96,7 +96,8 @@ Attachment MakeUnderKey(std::uint64_t installation, const StreamId& id, const Ge
         if (is_own) {
             RemoveIfAbandoned(installation, holder);
         }
-        const int shm_id = ::shmget(key, SegmentBytes(geometry), IPC_CREAT | IPC_EXCL | kSegmentMode);
+        const auto bytes = static_cast<std::size_t>(SegmentBytes(geometry));
+        const int shm_id = ::shmget(key, bytes, IPC_CREAT | IPC_EXCL | kSegmentMode);
         if (shm_id >= 0) {
             return AttachNew(shm_id);
         }
