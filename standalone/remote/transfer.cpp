@@ -52,6 +52,14 @@ bool IsOneOf(std::span<const std::string_view> types, std::string_view type) {
            std::ranges::find(types, name) != types.end();
 }
 
+// Reads a date of the form that HTTP wants; -1 where it is none. What libcurl has for it returns a time_t, which has 32
+// bits in the library of a 32-bit machine, but not here.
+std::int64_t SecondsOf(const char* date) {
+    std::tm parts{};
+    const char* rest = ::strptime(date, "%a, %d %b %Y %H:%M:%S GMT", &parts);
+    return rest == nullptr || *rest != '\0' ? -1 : ::timegm(&parts);
+}
+
 class Transfer {
   public:
     Transfer(const Host& host, const Request& request, const Expected& expected, Sink& sink)
@@ -137,7 +145,7 @@ class Transfer {
     std::string WhyNotAdmitted() const {
         curl_header* date = nullptr;
         if (::curl_easy_header(handle_.get(), "Date", 0, CURLH_HEADER, -1, &date) == CURLHE_OK) {
-            const std::time_t its_now_s = ::curl_getdate(date->value, nullptr);
+            const std::int64_t its_now_s = SecondsOf(date->value);
             const std::int64_t ahead_s = its_now_s - std::time(nullptr);
             if (its_now_s >= 0 && std::abs(ahead_s) > kPairTokenWindowSeconds) {
                 return "its clock is " + std::to_string(std::abs(ahead_s) / 60) + " minutes " +
