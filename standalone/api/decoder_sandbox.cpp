@@ -86,7 +86,7 @@ std::vector<sock_filter> StillPictureFilter() {
     filter.AddException({SCMP_SYS(read), SCMP_SYS(write), SCMP_SYS(writev), SCMP_SYS(recv), SCMP_SYS(recvfrom),
                          SCMP_SYS(sendmsg), SCMP_SYS(poll), SCMP_SYS(ppoll), SCMP_SYS(ppoll_time64), SCMP_SYS(fstat),
                          SCMP_SYS(fstat64), SCMP_SYS(newfstatat), SCMP_SYS(fstatat64), SCMP_SYS(statx), SCMP_SYS(lseek),
-                         SCMP_SYS(shutdown), SCMP_SYS(close)});
+                         SCMP_SYS(_llseek), SCMP_SYS(shutdown), SCMP_SYS(close)});
     filter.AddException({SCMP_SYS(brk), SCMP_SYS(madvise), SCMP_SYS(mremap), SCMP_SYS(munmap)});
     filter.AddException({SCMP_SYS(mmap), SCMP_SYS(mmap2), SCMP_SYS(mprotect)}, {{2, 0, PROT_EXEC}});
     filter.AddException({SCMP_SYS(clock_gettime), SCMP_SYS(clock_gettime64), SCMP_SYS(exit), SCMP_SYS(exit_group),
@@ -125,8 +125,8 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     }
     // What Landlock of many kernels does not know: emptying files, and changing whose they are.
     filter.AddException({SCMP_SYS(truncate), SCMP_SYS(truncate64), SCMP_SYS(creat), SCMP_SYS(openat2), SCMP_SYS(chmod),
-                         SCMP_SYS(fchmodat), SCMP_SYS(chown), SCMP_SYS(lchown), SCMP_SYS(fchownat), SCMP_SYS(setxattr),
-                         SCMP_SYS(lsetxattr)});
+                         SCMP_SYS(fchmodat), SCMP_SYS(chown), SCMP_SYS(chown32), SCMP_SYS(lchown), SCMP_SYS(lchown32),
+                         SCMP_SYS(fchownat), SCMP_SYS(setxattr), SCMP_SYS(lsetxattr)});
     filter.AddException({SCMP_SYS(open)}, {{1, O_TRUNC, O_TRUNC}});
     filter.AddException({SCMP_SYS(openat)}, {{2, O_TRUNC, O_TRUNC}});
     // The rings of live views.

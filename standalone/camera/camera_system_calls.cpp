@@ -35,11 +35,12 @@ void AllowHarmless(SystemCallFilter& filter) {
          // Time, and the thread itself.
          SCMP_SYS(clock_getres), SCMP_SYS(clock_getres_time64), SCMP_SYS(clock_gettime), SCMP_SYS(clock_gettime64),
          SCMP_SYS(clock_nanosleep), SCMP_SYS(clock_nanosleep_time64), SCMP_SYS(exit), SCMP_SYS(exit_group),
-         SCMP_SYS(futex), SCMP_SYS(futex_time64), SCMP_SYS(getegid), SCMP_SYS(geteuid), SCMP_SYS(getgid),
-         SCMP_SYS(getpid), SCMP_SYS(getrandom), SCMP_SYS(getrusage), SCMP_SYS(gettid), SCMP_SYS(gettimeofday),
-         SCMP_SYS(getuid), SCMP_SYS(nanosleep), SCMP_SYS(restart_syscall), SCMP_SYS(rt_sigaction),
-         SCMP_SYS(rt_sigprocmask), SCMP_SYS(rt_sigreturn), SCMP_SYS(sched_getaffinity), SCMP_SYS(sched_yield),
-         SCMP_SYS(sigaltstack), SCMP_SYS(sigreturn), SCMP_SYS(sysinfo), SCMP_SYS(time), SCMP_SYS(uname)});
+         SCMP_SYS(futex), SCMP_SYS(futex_time64), SCMP_SYS(getegid), SCMP_SYS(getegid32), SCMP_SYS(geteuid),
+         SCMP_SYS(geteuid32), SCMP_SYS(getgid), SCMP_SYS(getgid32), SCMP_SYS(getpid), SCMP_SYS(getrandom),
+         SCMP_SYS(getrusage), SCMP_SYS(gettid), SCMP_SYS(gettimeofday), SCMP_SYS(getuid), SCMP_SYS(getuid32),
+         SCMP_SYS(nanosleep), SCMP_SYS(restart_syscall), SCMP_SYS(rt_sigaction), SCMP_SYS(rt_sigprocmask),
+         SCMP_SYS(rt_sigreturn), SCMP_SYS(sched_getaffinity), SCMP_SYS(sched_yield), SCMP_SYS(sigaltstack),
+         SCMP_SYS(sigreturn), SCMP_SYS(sysinfo), SCMP_SYS(time), SCMP_SYS(uname)});
     if (kSanitized) {  // for its checks and reports
         filter.AddException({SCMP_SYS(pipe), SCMP_SYS(pipe2), SCMP_SYS(prctl), SCMP_SYS(prlimit64), SCMP_SYS(readlink),
                              SCMP_SYS(readlinkat)});
