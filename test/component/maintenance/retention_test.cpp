@@ -35,7 +35,8 @@ std::function<void(struct statvfs&)> g_lie;
 
 // In the place of the C library's: a file system that does not know what it holds.
 extern "C" int fstatvfs(int file, struct statvfs* report) {
-    static const auto real = reinterpret_cast<int (*)(int, struct statvfs*)>(::dlsym(RTLD_NEXT, "fstatvfs"));
+    // By the name that it has where files have sizes of 64 bits, which is an alias on machines of 64.
+    static const auto real = reinterpret_cast<int (*)(int, struct statvfs*)>(::dlsym(RTLD_NEXT, "fstatvfs64"));
     const int result = real(file, report);
     if (g_lie) {
         g_lie(*report);
