@@ -2,6 +2,11 @@
 #
 # One interface target that carries the warnings and sanitizers of all code of ours.
 add_library(lookhaven_options INTERFACE)
+if(CMAKE_SIZEOF_VOID_P EQUAL 4)
+    # Files beyond 2 GiB and times beyond 2038. Debian 12's libraries are built without, so none of their functions that
+    # take or return an off_t or a time_t may be called, but the C library's.
+    add_compile_definitions(_FILE_OFFSET_BITS=64 _TIME_BITS=64)
+endif()
 target_include_directories(lookhaven_options INTERFACE ${CMAKE_SOURCE_DIR})
 target_compile_options(lookhaven_options INTERFACE
     -Wall -Wextra -Wshadow -Wconversion -Werror -fvisibility=hidden -fno-omit-frame-pointer)

@@ -13,6 +13,15 @@ using lookhaven::test::Call;
 using lookhaven::test::CurrentPlatform;
 using lookhaven::test::Script;
 
+// Machines of 32 bits with times of 64 have another function behind time(); CMakeLists.txt wraps that.
+#ifdef __USE_TIME_BITS64
+#define REAL_TIME __real___time64
+#define WRAP_TIME __wrap___time64
+#else
+#define REAL_TIME __real_time
+#define WRAP_TIME __wrap_time
+#endif
+
 namespace {
 
 void RecordMutex(const char* what, const pthread_mutex_t* mutex) {
@@ -26,7 +35,7 @@ void RecordMutex(const char* what, const pthread_mutex_t* mutex) {
 extern "C" {
 
 int __real_sigaction(int, const struct sigaction*, struct sigaction*);
-std::time_t __real_time(std::time_t*);
+std::time_t REAL_TIME(std::time_t*);
 int __real_fflush(std::FILE*);
 int __real_feof(std::FILE*);
 int __real_ferror(std::FILE*);
@@ -50,8 +59,8 @@ unsigned int __wrap_sleep(unsigned int seconds) {
 int __wrap_usleep(useconds_t microseconds) {
     return Call("usleep", microseconds), 0;
 }
-std::time_t __wrap_time(std::time_t* result) {
-    return CurrentPlatform() == nullptr ? __real_time(result) : Script().now;
+std::time_t WRAP_TIME(std::time_t* result) {
+    return CurrentPlatform() == nullptr ? REAL_TIME(result) : Script().now;
 }
 int __wrap_fflush(std::FILE* stream) {
     if (CurrentPlatform() == nullptr || stream != stdout) {
