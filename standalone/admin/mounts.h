@@ -3,8 +3,8 @@
 // Changes of storage mounts.
 //
 // Failures      Besides what its declaration names, each throws Forbidden, Stale, UnusableFolder, store::NotFound,
-//               store::InvalidRecord, store::StoreError, and std::system_error where a folder fails; nothing was changed
-//               then.
+//               store::InvalidRecord, store::StoreError, and std::system_error where a folder fails; nothing was
+//               changed then.
 #pragma once
 
 #include <cstdint>

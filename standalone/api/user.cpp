@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.User: accounts and what they are denied, their sessions; and everybody's own password. Whatever tells of accounts
-// takes POST, too: then no address of it ends up in a log or a browser's history.
+// VEXO.User: accounts and what they are denied, their sessions; and everybody's own password. Whatever tells of
+// accounts takes POST, too: then no address of it ends up in a log or a browser's history.
 #include <algorithm>
 #include <optional>
 #include <vector>

@@ -3,8 +3,8 @@
 // What an owner needs to set up the same installation on another machine: its records and pictures of e-maps, and, on
 // request, its certificate; not its recordings.
 //
-// Why so        Records are copied row by row into a SQLite file, whatever engine keeps them, so that a backup of either
-//               can be restored into either, and an older one into a newer program.
+// Why so        Records are copied row by row into a SQLite file, whatever engine keeps them, so that a backup of
+//               either can be restored into either, and an older one into a newer program.
 // See           docs/guide/backup.md
 #pragma once
 

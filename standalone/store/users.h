@@ -62,8 +62,8 @@ struct VerifiedUser : User {
     std::string password_hash;
 };
 
-// Invariants    (1) A change that takes a right away (password, privilege, denial, removal) ends the user's sessions with it.
-//                   So does one of a group that is denied.
+// Invariants    (1) A change that takes a right away (password, privilege, denial, removal) ends the user's sessions
+//                   with it. So does one of a group that is denied.
 //               (2) Names are compared without regard to case; no account is called "Lookhaven".
 class Users {
   public:
