@@ -2,6 +2,7 @@
 #include "standalone/backup/backup.h"
 
 #include <algorithm>
+#include <array>
 #include <filesystem>
 #include <map>
 #include <memory>
@@ -16,6 +17,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/store/copy.h"
 
 namespace lookhaven::backup {
@@ -29,6 +31,8 @@ constexpr const char* kManifest = "manifest.json";
 constexpr const char* kRecords = "records.db";
 constexpr const char* kPictures = "emaps";
 constexpr const char* kCertificate = "tls";
+// The last one says which of them Lookhaven made itself.
+constexpr std::array<std::string_view, 3> kCertificateFiles = {"certificate.pem", "key.pem", "made-here"};
 
 // A folder of its own in the run folder; what an interrupted one left goes first.
 class WorkFolder {
@@ -61,22 +65,29 @@ std::string SqliteUrl(const fs::path& path) {
     return "sqlite:" + path.string();
 }
 
-// Digits, letters, "-", "_" and "."; not hidden, so neither "." nor "..".
-bool IsPlainName(std::string_view name) {
-    return !name.empty() && name.front() != '.' && std::ranges::all_of(name, [](char c) {
-        return (c >= '0' && c <= '9') || (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || c == '-' || c == '_' ||
-               c == '.';
-    });
-}
+// Of the manifest, of a file of the certificate, and of how many files there may be.
+constexpr std::uintmax_t kMaxTextBytes = std::uintmax_t{1} << 20U;
+constexpr std::size_t kMaxFiles = 10'000;
 
-// Whether a file of that name belongs to a backup: it is written where its name says.
-bool IsKnownName(std::string_view name) {
-    const std::size_t slash = name.find('/');
-    if (slash == std::string_view::npos) {
-        return name == kManifest || name == kRecords;
+// How large a file of that name may be, which is written where the name says; nothing for one that belongs to no
+// backup. Of a disk that has just room for the records, half stays free for their copy.
+std::optional<std::uintmax_t> MaxBytesOf(std::string_view name, const fs::path& folder) {
+    if (name == kRecords) {
+        return fs::space(folder).available / 2;
     }
-    const std::string_view folder = name.substr(0, slash);
-    return (folder == kPictures || folder == kCertificate) && IsPlainName(name.substr(slash + 1));
+    if (name == kManifest) {
+        return kMaxTextBytes;
+    }
+    const std::size_t slash = std::min(name.find('/'), name.size());
+    const std::string_view file = name.substr(std::min(slash + 1, name.size()));
+    if (name.substr(0, slash) == kPictures && emap::IsPictureName(file)) {
+        return emap::kMaxPictureBytes;
+    }
+    if (name.substr(0, slash) == kCertificate &&
+        std::ranges::find(kCertificateFiles, file) != kCertificateFiles.end()) {
+        return kMaxTextBytes;
+    }
+    return std::nullopt;
 }
 
 class BackupWriter {
@@ -91,13 +102,14 @@ class BackupWriter {
         file["sha256"] = digest.sha256;
     }
 
-    // The files of a folder that may lack; returns how many there are.
+    // The folder's files that belong to a backup, if there is a folder; returns how many there are.
     int AddFolder(const std::string& folder, const fs::path& path) {
         std::error_code error;
         int count = 0;
         for (const fs::directory_entry& file : fs::directory_iterator(path, error)) {
-            if (fs::is_regular_file(file.symlink_status()) && IsPlainName(file.path().filename().string())) {
-                Add(folder + "/" + file.path().filename().string(), file.path());
+            const std::string name = folder + "/" + file.path().filename().string();
+            if (fs::is_regular_file(file.symlink_status()) && MaxBytesOf(name, path)) {
+                Add(name, file.path());
                 ++count;
             }
         }
@@ -155,10 +167,11 @@ Summary Unpack(int descriptor, const WorkFolder& folder) {
     std::map<std::string, FileDigest> files;
     bool is_whole = false;
     while (const std::optional<std::string> name = tar.Next()) {
-        if (!IsKnownName(*name) || files.contains(*name) || is_whole) {
+        const std::optional<std::uintmax_t> max_bytes = MaxBytesOf(*name, folder / "");
+        if (!max_bytes || files.contains(*name) || files.size() == kMaxFiles || is_whole) {
             throw Malformed("this is no backup, or a damaged one: it holds a file that belongs to none");
         }
-        const FileDigest digest = tar.CopyTo(folder / *name);
+        const FileDigest digest = tar.CopyTo(folder / *name, *max_bytes);
         is_whole = *name == kManifest;
         if (!is_whole) {
             files[*name] = digest;
@@ -195,6 +208,7 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     {
         store::Store copy = store::Store::Open(SqliteUrl(records));
         summary.records = CopyRecords(store, copy, store::CopySessions::kNo);
+        store::GatherInOneFile(copy);
     }
     BackupWriter writer(descriptor);
     writer.Add(kRecords, records);
@@ -210,10 +224,12 @@ Summary Restore(const base::Installation& installation, int descriptor) {
     const WorkFolder folder(installation);
     Summary summary = Unpack(descriptor, folder);
     const std::string records = SqliteUrl(folder / kRecords);
+    store::RequireTablesOnly(records);
     store::Store::Migrate(records);
     store::Store source = store::Store::Open(records);
     store::Store::Migrate(installation.StoreUrl());
     store::Store target = store::Store::Open(installation.StoreUrl());
+    store::RequireUnused(target);
     // First the pictures, which no map names yet: a map never lacks its picture.
     summary.pictures = MoveFiles(folder / kPictures, installation.Home() / kPictures);
     summary.records = CopyRecords(source, target, store::CopySessions::kNo);

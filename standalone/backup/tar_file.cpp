@@ -147,9 +147,10 @@ std::optional<std::string> TarReader::Next() {
     return name;
 }
 
-FileDigest TarReader::CopyTo(const std::filesystem::path& path) {
+FileDigest TarReader::CopyTo(const std::filesystem::path& path, std::uintmax_t max_bytes) {
     const base::FileDescriptor file = base::OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, kPrivate);
     Sha256 hash;
+    std::uintmax_t bytes = 0;
     std::vector<char> block(kBlockBytes);
     for (;;) {
         const la_ssize_t count = ::archive_read_data(archive_.get(), block.data(), block.size());
@@ -158,6 +159,10 @@ FileDigest TarReader::CopyTo(const std::filesystem::path& path) {
         }
         if (count == 0) {
             return hash.Finish();
+        }
+        bytes += static_cast<std::uintmax_t>(count);
+        if (bytes > max_bytes) {
+            throw Malformed("the backup holds a file that is too large");
         }
         hash.Add(block.data(), static_cast<std::size_t>(count));
         if (!base::WriteAll(file.Get(), block.data(), static_cast<std::size_t>(count))) {

@@ -55,9 +55,9 @@ class TarReader {
 
     // The name of the next file; nothing at the end. Anything but a regular file is malformed.
     std::optional<std::string> Next();
-    // The contents of the file that Next found; once. Throws std::system_error too, when path exists already or cannot
-    // be written.
-    FileDigest CopyTo(const std::filesystem::path& path);
+    // The contents of the file that Next found; once. Malformed where there are more than max_bytes, the rest of
+    // which is not written. Throws std::system_error too, when path exists already or cannot be written.
+    FileDigest CopyTo(const std::filesystem::path& path, std::uintmax_t max_bytes);
 
   private:
     std::unique_ptr<archive, int (*)(archive*)> archive_;

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/installation.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/state_folder.h"
@@ -64,6 +66,10 @@ void Installation::SetStoreUrl(const std::string& url) const {
         std::filesystem::remove(override_file);
     } else {
         WriteFileAtomically(override_file, url + "\n");
+    }
+    // Else a power cut may bring the other store back.
+    if (::fsync(OpenFile(home_, O_RDONLY | O_DIRECTORY).Get()) != 0) {
+        ThrowErrno("cannot write to " + home_.string());
     }
 }
 

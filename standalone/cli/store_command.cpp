@@ -17,16 +17,17 @@ struct Request {
     std::string url;
 };
 
-// A password has no place on the screen.
+// A password has no place on the screen: it may stand before the host, among what follows "?", and in connection
+// options.
 std::string WithoutPassword(const std::string& url) {
     const std::size_t begin = url.find("://");
-    const std::size_t at = url.find('@');
-    if (begin != std::string::npos && at != std::string::npos) {
-        const std::size_t colon = url.find(':', begin + 3);
-        return colon < at ? url.substr(0, colon) + url.substr(at) : url;
+    if (begin == std::string::npos) {
+        return url.starts_with("sqlite:") ? url : "postgresql: (connection options)";
     }
-    const std::size_t password = url.find("password=");
-    return password == std::string::npos ? url : url.substr(0, password) + "password=…";
+    const std::string address = url.substr(0, url.find('?'));
+    const std::size_t at = address.rfind('@');
+    const std::size_t colon = address.find(':', begin + 3);
+    return at != std::string::npos && colon < at ? address.substr(0, colon) + address.substr(at) : address;
 }
 
 void Show(const Console& console) {

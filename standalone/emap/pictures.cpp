@@ -58,7 +58,8 @@ bool IsSvg(std::string_view text) {
     return text.starts_with("<svg") && text.size() > 4 && " \t\r\n/>"sv.find(text[4]) != std::string_view::npos;
 }
 
-// "<digits>-<16 hex digits>.<type>"
+}  // namespace
+
 bool IsPictureName(std::string_view name) {
     const std::size_t dash = name.find('-');
     const std::size_t dot = name.find('.');
@@ -70,8 +71,6 @@ bool IsPictureName(std::string_view name) {
            base::IsHex(name.substr(dash + 1, 16), 16) &&
            (type == "png" || type == "jpg" || type == "webp" || type == "svg");
 }
-
-}  // namespace
 
 std::string_view PictureType(std::string_view bytes) {
     if (bytes.starts_with("\x89PNG\r\n\x1a\n"sv)) {

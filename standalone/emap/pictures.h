@@ -21,6 +21,9 @@ constexpr std::size_t kMaxPictureBytes = 16U << 20U;
 // "png", "jpg", "webp" or "svg"; empty for anything else. An SVG that declares entities is nothing of these.
 std::string_view PictureType(std::string_view bytes);
 
+// Whether a file in that folder may have the name: "<digits>-<16 hex digits>.<type>".
+bool IsPictureName(std::string_view name);
+
 class Pictures {
   public:
     // The store must outlive this object.

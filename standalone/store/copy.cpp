@@ -71,13 +71,21 @@ void Assign(const soci::row& row, std::size_t column, Value& value) {
     }
 }
 
+// It becomes part of a statement, and the source may be a file from anywhere.
+std::string PlainName(const std::string& column) {
+    if (column.empty() || column.find_first_not_of("abcdefghijklmnopqrstuvwxyz_") != std::string::npos) {
+        throw StoreError("the record store has a column of a name that is none of its own");
+    }
+    return column;
+}
+
 // Inserts rows whose columns are those of the first one.
 class Insertion {
   public:
     Insertion(soci::session& sql, const std::string& table, const soci::row& first) : statement_(sql) {
         std::string columns;
         for (std::size_t i = 0; i < first.size(); ++i) {
-            columns += (i == 0 ? "" : ", ") + first.get_properties(i).get_name();
+            columns += (i == 0 ? "" : ", ") + PlainName(first.get_properties(i).get_name());
             Assign(first, i, values_.emplace_back());
             if (values_.back().is_text) {
                 statement_.exchange(soci::use(values_.back().text));
@@ -141,17 +149,6 @@ std::int64_t CopyTable(Connection& source, soci::session& from, soci::session& t
     return all;
 }
 
-// Records that somebody made; those of a new store may be replaced.
-void RequireUnused(soci::session& sql) {
-    for (const auto& [table, records] : {std::pair("users", "accounts"), std::pair("cameras", "cameras"),
-                                         std::pair("events", "recordings"), std::pair("marks", "alerts")}) {
-        if (FetchOne<int>(sql, std::string("select count(*) from ") + table).value() > 0) {
-            throw InvalidRecord("the record store to fill is in use, it has " + std::string(records) +
-                                " of its own: use an empty one");
-        }
-    }
-}
-
 void LiftTimeLimit(Connection& connection, soci::session& sql) {
     if (!connection.IsSqlite()) {
         sql << "set local statement_timeout = 0";
@@ -160,13 +157,37 @@ void LiftTimeLimit(Connection& connection, soci::session& sql) {
 
 }  // namespace
 
+void RequireUnused(Store& store) {
+    for (const auto& [table, records] : {std::pair("users", "accounts"), std::pair("cameras", "cameras"),
+                                         std::pair("events", "recordings"), std::pair("marks", "alerts")}) {
+        if (store.connection().FetchOne<int>(std::string("select count(*) from ") + table).value() > 0) {
+            throw InvalidRecord("the record store to fill is in use, it has " + std::string(records) +
+                                " of its own: use an empty one");
+        }
+    }
+}
+
+void RequireTablesOnly(const std::string& url) {
+    Connection connection(StoreAddress::Parse(url));
+    if (connection.FetchOne<int>("select count(*) from sqlite_master where type not in ('table', 'index')").value() >
+        0) {
+        throw InvalidRecord("the records hold views or triggers, as Lookhaven makes none");
+    }
+}
+
+void GatherInOneFile(Store& store) {
+    if (store.connection().FetchOne<std::string>("pragma journal_mode = delete") != "delete") {
+        throw StoreError("the records could not be written to one file");
+    }
+}
+
 std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
     const std::vector<std::string> tables = CopiedTables(sessions);
     return source.connection().ReadAtOneMoment([&](soci::session& from) {
         LiftTimeLimit(source.connection(), from);
         return target.connection().Write([&](soci::session& to) {
             LiftTimeLimit(target.connection(), to);
-            RequireUnused(to);
+            RequireUnused(target);
             for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
                 Execute(to, "delete from " + *table);
             }

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
 
 #include "standalone/store/store.h"
 
@@ -11,9 +12,19 @@ namespace lookhaven::store {
 
 enum class CopySessions { kNo, kYes };
 
+// Throws InvalidRecord for a store with accounts, cameras or recordings of its own.
+void RequireUnused(Store& store);
+
+// For a SQLite file that a stranger may have made, before it is used in any other way: throws InvalidRecord when it
+// holds views or triggers, which would run statements of theirs.
+void RequireTablesOnly(const std::string& url);
+
 // What one moment of the source holds, its counters and settings included, while others go on changing it. The target
-// was just set up: InvalidRecord when it has accounts, cameras or recordings of its own, which would be lost. Returns
-// the number of rows. The recorder's lease is not copied, nor are failed log-ins.
+// was just set up: throws as RequireUnused, since its records would be lost. Returns the number of rows. The recorder's
+// lease is not copied, nor are failed log-ins.
 std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions);
+
+// Has all of a SQLite store in its one file, which may be copied once the store is closed. Throws StoreError.
+void GatherInOneFile(Store& store);
 
 }  // namespace lookhaven::store

@@ -89,7 +89,9 @@ TEST_F(BackupTest, WhatIsNoWholeBackupLeavesEverythingAsItWas) {
     make("nothing", [](TarWriter&) {});
     make("outside", [](TarWriter& tar) { tar.AddText("emaps/../../escaped", "x"); });
     make("absolute", [](TarWriter& tar) { tar.AddText("/tmp/escaped", "x"); });
-    make("hidden", [](TarWriter& tar) { tar.AddText("tls/.hidden", "x"); });
+    make("foreign", [](TarWriter& tar) { tar.AddText("tls/other.pem", "x"); });
+    make("no picture", [](TarWriter& tar) { tar.AddText("emaps/map.png", "x"); });
+    make("too large", [](TarWriter& tar) { tar.AddText("tls/key.pem", std::string((1U << 20U) + 1, 'x')); });
     make("endless", [](TarWriter& tar) { tar.AddText("records.db", "x"); });
     make("twice", [](TarWriter& tar) {
         tar.AddText("records.db", "x");
@@ -101,8 +103,8 @@ TEST_F(BackupTest, WhatIsNoWholeBackupLeavesEverythingAsItWas) {
     });
     make("false types", [&](TarWriter& tar) { tar.AddText("manifest.json", R"({"lookhaven_backup":[1]})"); });
     make("no records", [&](TarWriter& tar) { tar.AddText("manifest.json", R"({"lookhaven_backup":1})"); });
-    for (const char* name : {"cut", "text", "empty", "nothing", "outside", "absolute", "hidden", "endless", "twice",
-                             "false hash", "false types", "no records"}) {
+    for (const char* name : {"cut", "text", "empty", "nothing", "outside", "absolute", "foreign", "no picture",
+                             "too large", "endless", "twice", "false hash", "false types", "no records"}) {
         EXPECT_THROW(Restore(name), Malformed) << name;
         EXPECT_FALSE(fs::exists(new_.RunFolder() / "backup")) << name;
     }
