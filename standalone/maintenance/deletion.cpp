@@ -2,7 +2,6 @@
 #include "standalone/maintenance/deletion.h"
 
 #include <algorithm>
-#include <exception>
 #include <filesystem>
 #include <map>
 #include <optional>
@@ -18,6 +17,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
+constexpr std::size_t kEventsAtOnce = 100;
 constexpr int kMarksAtOnce = 100;
 
 std::vector<int> IdsOf(std::span<const store::Event> events) {
@@ -38,20 +38,27 @@ void Deletion::Delete(std::span<const store::Event> events) {
 }
 
 void Deletion::Finish() {
-    std::vector<store::Event> pending = events_.PendingDeletion(mount_.id);
-    std::exception_ptr failure;
-    for (auto event = pending.begin(); event != pending.end(); ++event) {
+    const std::vector<store::Event> pending = events_.PendingDeletion(mount_.id);
+    for (std::span rest(pending); !rest.empty();) {
+        const std::span page = rest.first(std::min(rest.size(), kEventsAtOnce));
+        std::size_t removed = 0;
         try {
-            RemoveFile(*event);
+            for (; removed < page.size(); ++removed) {
+                RemoveFile(page[removed]);
+            }
         } catch (const std::system_error&) {
-            failure = std::current_exception();
-            events_.CancelDeletion(IdsOf({event, pending.end()}));
-            pending.erase(event, pending.end());
-            break;
+            events_.CancelDeletion(IdsOf(rest.subspan(removed)));
+            Forget(page.first(removed));
+            throw;
         }
+        Forget(page);
+        rest = rest.subspan(page.size());
     }
+}
+
+void Deletion::Forget(std::span<const store::Event> events) {
     std::map<int, std::int64_t> ends_s;  // of what each camera has lost
-    for (const store::Event& event : pending) {
+    for (const store::Event& event : events) {
         ++result_.events;
         result_.bytes += event.size_bytes;
         // What a wrong clock dated ahead says nothing about the marks before it.
@@ -63,15 +70,12 @@ void Deletion::Finish() {
     for (const auto& [camera, end_s] : ends_s) {
         RemoveMarks(camera, end_s);
     }
-    for (const store::Event& event : pending) {
+    for (const store::Event& event : events) {
         if (archive::DayOf(event.start_s) != archive::DayOf(now_s_)) {
             folder_.RemoveDayIfEmpty(event.camera_id, event.start_s);
         }
     }
-    events_.FinishDeletion(IdsOf(pending));
-    if (failure) {
-        std::rethrow_exception(failure);
-    }
+    events_.FinishDeletion(IdsOf(events));
 }
 
 void Deletion::RemoveFile(const store::Event& event) {

@@ -49,6 +49,8 @@ class Deletion {
 
   private:
     void RemoveFile(const store::Event& event);
+    // The rows of removed files, and what else tells of them.
+    void Forget(std::span<const store::Event> events);
     bool HasFootage(int camera, std::int64_t begin_s, std::int64_t end_s);
     // Those that ended by then and have no footage left, however many before them have some.
     void RemoveMarks(int camera, std::int64_t end_s);

@@ -75,7 +75,9 @@ void Move(Connection& connection, std::span<const int> ids, const std::string& f
     const std::string which = " from " + from + " where id = :id" + condition;
     connection.Write([&](soci::session& sql) {
         ForEachId(sql, ids, "insert into " + to + " (" + columns + ") select " + columns + which);
-        ForEachId(sql, ids, "delete" + which);
+        ForEachId(sql, ids, "delete" + which + " and id in (select id from " + to + ")");
+        // On PostgreSQL a row may have come to meet the condition, or no longer to meet it, between the two.
+        ForEachId(sql, ids, "delete from " + to + " where id = :id and id in (select id from " + from + ")");
     });
 }
 
