@@ -89,7 +89,8 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
             if (const auto folder = maintenance::OpenMount(records, mount)) {
                 figures.space = folder->Space();
                 const auto state = states.find(mount.id);
-                figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady;
+                figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady ||
+                                state->second == maintenance::MountState::kKeptFull;
             }
         } catch (const std::system_error&) {
             figures.is_up = false;  // and why, the health says

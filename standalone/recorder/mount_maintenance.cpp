@@ -103,12 +103,13 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
             base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
                           " old events");
         }
+        is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
     }
     if (!recovery_failure_.empty()) {
         SetStatus(MountState::kFailing, recovery_failure_);
     } else if (disk_watch_.IsHeld()) {
         SetStatus(MountState::kSpaceHeld, mount.path);
-    } else if (mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes) {
+    } else if (is_full_of_kept_) {
         SetStatus(MountState::kKeptFull, mount.path);
     } else {
         SetStatus(MountState::kReady, "");

@@ -78,6 +78,7 @@ class MountMaintenance {
     Pause after_failure_;
     Pause after_recovery_;
     std::int64_t next_retention_us_ = 0;
+    bool is_full_of_kept_ = false;
     int seen_space_requests_ = 0;
 
     std::atomic<bool> is_recovered_ = false;

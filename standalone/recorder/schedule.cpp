@@ -7,8 +7,15 @@ namespace lookhaven::recorder {
 
 namespace {
 
+// 1 January 2024: no clock that is right shows less, and which hour it is nobody knows then.
+constexpr std::int64_t kEarliestS = 1'704'067'200;
+
 store::HourMode ModeAt(const CameraPlan& plan, std::int64_t time_s) {
-    return store::ModeOfHour(plan.mode, plan.hours, base::LocalHourOfWeek(time_s));
+    if (plan.mode != store::RecordMode::kSchedule) {
+        return store::ModeOfHour(plan.mode, plan.hours, 0);
+    }
+    return time_s < kEarliestS ? store::HourMode::kAlways
+                               : store::ModeOfHour(plan.mode, plan.hours, base::LocalHourOfWeek(time_s));
 }
 
 }  // namespace

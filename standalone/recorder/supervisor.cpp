@@ -112,6 +112,7 @@ void Supervisor::Reconcile() {
         }
     }
     DropEndedWorkers();
+    std::erase_if(reported_failures_, [&](const auto& failure) { return !plans.contains(failure.first); });
     for (const auto& [stream, plan] : plans) {
         if (!workers_.contains(stream)) {
             Start(stream, plan);

@@ -52,9 +52,12 @@ HourMode ModeOfHour(RecordMode mode, const std::string& hours, int hour_of_week)
     if (mode == RecordMode::kAlways) {
         return HourMode::kAlways;
     }
-    return mode == RecordMode::kNever || hours.empty()
-               ? HourMode::kAroundMarks
-               : static_cast<HourMode>(hours.at(static_cast<std::size_t>(hour_of_week)));
+    if (mode == RecordMode::kNever || hours.empty()) {
+        return HourMode::kAroundMarks;
+    }
+    const auto hour = static_cast<std::size_t>(hour_of_week);
+    // Of a damaged row rather too much is recorded than nothing.
+    return hour < hours.size() ? static_cast<HourMode>(hours[hour]) : HourMode::kAlways;
 }
 
 HourMode RecordingPlan::At(std::int64_t time_s) const {

@@ -67,6 +67,7 @@ TEST_F(ScheduleTest, APlanIsFollowedHourByHour) {
         {"always", kHour, RecordMode::kAlways, 10, true},
         {"on alarm", 2 * kHour, RecordMode::kNever, 10, true},
         {"to its last second", 3 * kHour - 1, RecordMode::kNever, 10, true},
+        {"in the year 1970, before any clock is right", -kMonday, RecordMode::kAlways, 10, true},
         {"never again", 3 * kHour, RecordMode::kNever, 0, false},
         {"soon, so that a first mark has footage from before it", 168 * kHour + kHour - 10, RecordMode::kNever, 10,
          false},
