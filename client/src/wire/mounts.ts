@@ -35,8 +35,8 @@ export interface MountRecord extends Omit<MountSettings, "limitBytes" | "limitDa
   lastsDays: number | null;
   /** What is left of the last 30 days. */
   history: { day: string; bytes: number }[];
-  /** One that was removed has no name. */
-  camera: { id: number; name?: string; perDay: number }[];
+  /** The name is empty for a camera that was removed. */
+  camera: { id: number; name: string; perDay: number }[];
 }
 
 /** What a new limit would delete at once. */

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How much was recorded on each of the last days, as bars.
+// How much footage is left of each of the last days, as bars.
 
 import type { MountRecord } from "../../../wire/mounts";
 import { bytesText } from "../../widgets/amounts";
@@ -14,7 +14,7 @@ const kGap = 2;
 
 export function historyPlot(history: MountRecord["history"]): HTMLElement {
   const most = Math.max(...history.map(({ bytes }) => bytes), 0);
-  if (most === 0) return element("p", { class: "quiet" }, "Nothing was recorded in the last 30 days.");
+  if (most === 0) return element("p", { class: "quiet" }, "No footage of the last 30 days is left.");
   const dayText = (day: string) => shortDate(Date.parse(`${day}T12:00`));
   const bars = history.map(({ day, bytes }, at) => {
     const height = bytes === 0 ? 0 : Math.max(1, (bytes / most) * kHeight);
@@ -24,7 +24,7 @@ export function historyPlot(history: MountRecord["history"]): HTMLElement {
   });
   const [first, last] = [history[0]!.day, history.at(-1)!.day].map(dayText);
   const width = history.length * (kBarWidth + kGap) - kGap;
-  const label = `Recorded each day from ${first} to ${last}, at most ${bytesText(most)}`;
+  const label = `Footage left of each day from ${first} to ${last}, at most ${bytesText(most)}`;
   const size = { viewBox: `0 0 ${width} ${kHeight}`, preserveAspectRatio: "none" };
   const plot = svgElement("svg", { class: "plot", ...size, role: "img", "aria-label": label }, ...bars);
   const caption = element(

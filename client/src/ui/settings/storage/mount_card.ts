@@ -35,7 +35,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
     fact("Recordings", bytesText(mount.used)),
     fact("Free", total === null || free === null ? "unknown" : `${bytesText(free)} of ${bytesText(total)}`),
     fact("Oldest footage", oldest),
-    fact("A day", bytesText(mount.perDay)),
+    fact("Per day", bytesText(mount.perDay)),
     fact("Limits", limitText(mount.limit)),
   );
   return element(
@@ -72,9 +72,9 @@ function usageBar(total: number, free: number, used: number): HTMLElement {
 function cameras({ camera }: MountRecord): HTMLElement[] {
   if (camera.length === 0) return [];
   const most = [...camera].sort((one, other) => other.perDay - one.perDay);
-  const rows = most.map(({ name = "a removed camera", perDay }) => {
+  const rows = most.map(({ name, perDay }) => {
     const need = element("td", {}, `${bytesText(perDay)} a day`);
-    return element("tr", {}, element("th", { scope: "row" }, name), need);
+    return element("tr", {}, element("th", { scope: "row" }, name || "removed camera"), need);
   });
   const summary = element("summary", {}, `By camera (${camera.length})`);
   return [element("details", { class: "form-more" }, summary, plainTable([], rows))];

@@ -53,16 +53,17 @@ export class MountPage extends LoadedPage<MountRecord[]> {
   #showForm(): void {
     const mount = this.#mount;
     const name = textField("Name", { maxlength: "80" });
-    const where = "An empty folder of the server, below one of those that its operator allows: at first /mnt, /media and /srv.";
+    const where =
+      "An empty folder on the server, below one that its operator allows (initially /mnt, /media and /srv).";
     const path = textField("Folder", { readonly: mount !== null, placeholder: "/srv/recordings" }, mount ? "" : where);
-    const enabled = checkField("Record to it", "If not, what it has can still be watched.");
+    const enabled = checkField("Record to this mount", "When off, its recordings can still be played.");
     const isDefault = checkField("The default mount", "For cameras that name no other.");
     const [days, gigabytes] = [numberField("Days", 1, 36_500), numberField("Size in GB", 0.1, 10_000_000)];
     const effect = element("p", { class: "form-hint", "aria-live": "polite" });
     enabled.root.hidden = mount === null;
     // Another one is made the default instead.
     isDefault.root.hidden = mount?.default ?? false;
-    const hint = "What is older or more is deleted, the oldest first. Empty: no limit but the disk.";
+    const hint = "Footage beyond either limit is deleted, the oldest first. Leave empty for no limit but the disk.";
     const limits = formPart("Limits", element("p", { class: "form-hint" }, hint), formRow(days, gigabytes), effect);
     const read = (): Settings => ({
       name: name.value.trim(),
@@ -99,7 +100,7 @@ export class MountPage extends LoadedPage<MountRecord[]> {
         describe: {
           name: ["Name", String],
           path: ["Folder", String],
-          enabled: ["Recorded to", yesNo],
+          enabled: ["Record to this mount", yesNo],
           default: ["Default", yesNo],
           limitBytes: ["At most", (value) => (value === null ? "no limit" : bytesText(value))],
           limitDays: ["Days", (value) => (value === null ? "no limit" : String(value))],
@@ -137,7 +138,7 @@ export class MountPage extends LoadedPage<MountRecord[]> {
     save: () => ReturnType<Mounts["set"]>,
   ): Promise<MountRecord | null> {
     const what = `${counted(events, "event")} with ${bytesText(bytes)} of footage`;
-    const sentence = `These limits delete ${what}: everything before ${minuteText(until * 1000)}.`;
+    const sentence = `These limits would delete ${what}: everything before ${minuteText(until * 1000)}.`;
     let saved: MountRecord | null = null;
     await openDialog(this.root, {
       title: "Delete footage?",
@@ -155,7 +156,7 @@ export class MountPage extends LoadedPage<MountRecord[]> {
     const mount = this.#mount!;
     const isDone = await openDialog(this.root, {
       title: `Remove ${mount.name}?`,
-      content: [element("p", {}, "The server forgets the folder; files in it stay.")],
+      content: [element("p", {}, "The server stops using the folder; its files stay.")],
       submit: "Remove",
       attempt: async () => void (await this.#mounts.remove(mount)),
     });

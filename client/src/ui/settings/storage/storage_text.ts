@@ -10,15 +10,16 @@ const kStates: Record<string, string> = {
   "read-only": "read only",
   "no-access": "not accessible",
   full: "full",
+  "kept-full": "full of kept recordings",
   failing: "failing",
   "in-use": "in use by another recorder",
-  "space-held": "its space is held",
+  "space-held": "deleting frees no space",
   absent: "not mounted",
-  foreign: "another mount's",
+  foreign: "belongs to another mount",
 };
 
 export function stateText({ enabled, state }: Pick<MountRecord, "enabled" | "state">): string {
-  return enabled ? (kStates[state] ?? state) : "not recorded to";
+  return enabled ? (kStates[state] ?? state) : "recording off";
 }
 
 /** "keeps 30 days, at most 500 GB", "keeps as much as there is room for". */
@@ -29,7 +30,8 @@ export function limitText({ bytes, days }: MountRecord["limit"]): string {
 
 /** For how long there is room, in words. */
 export function forecastText(lastsDays: number | null): string {
-  return lastsDays === null ? "For how long it lasts is not known yet." : `Lasts for about ${daysText(lastsDays)} of footage.`;
+  if (lastsDays === null) return "Not enough has been recorded to tell how long footage lasts.";
+  return `Room for about ${daysText(lastsDays)} of footage.`;
 }
 
 /** What limits come to, at what is recorded now. */
