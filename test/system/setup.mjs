@@ -11,7 +11,7 @@ await visit(async (page, complaints) => {
   await logIn(page);
   await page.getByRole("link", { name: "Add a camera" }).click();
   await page.getByLabel("Address", { exact: true }).fill(process.env.CAMERA);
-  await page.getByRole("button", { name: "Try this camera" }).click();
+  await page.getByRole("button", { name: "Test connection" }).click();
   await page.locator(".probe-picture").waitFor({ timeout: 30_000 });
   await page.screenshot({ path: `${folder}/tried.png` });
   await report("tried", {

@@ -27,7 +27,7 @@ class SetupTest(unittest.TestCase):
         with Visit("setup.mjs", f"http://127.0.0.1:{server.port}/", CAMERA=source) as visit:
             tried = visit.see("tried")
             self.assertEqual(tried["size"], [320, 240])
-            self.assertEqual(tried["facts"], "H.264 · 320 × 240 · 25 pictures a second · with sound")
+            self.assertEqual(tried["facts"], "H.264 · 320 × 240 · 25 fps · with sound")
             visit.see("on the wall")
             headers = {"Content-Type": "application/json"}
             answer = server.request(call("VEXO.Camera", "List"), "admin", body="{}", headers=headers)

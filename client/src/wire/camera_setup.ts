@@ -40,7 +40,7 @@ export interface CameraSettings {
   enabled: boolean;
   source: CameraSource[];
   account: string;
-  /** Takes any TLS certificate. */
+  /** Accepts any TLS certificate. */
   insecure: boolean;
   audio: boolean;
   ptz: boolean;
@@ -76,7 +76,7 @@ export interface CameraSetupList {
   camera: CameraRecord[];
   group: Named[];
   mount: (Named & { default: boolean })[];
-  /** Usual paths of RTSP addresses. */
+  /** Common paths of RTSP addresses. */
   path: { name: string; path: string }[];
 }
 
@@ -125,7 +125,7 @@ export class CameraSetup {
     return this.#server.call(kApi, "Probe", {}, { json: request, signal, timeoutMs: kProbeTimeoutMs });
   }
 
-  /** `codec` as a trial told it; empty: the recorder finds out. */
+  /** `codec` as a probe reported it; empty: the recorder finds out. */
   async add(settings: Omit<CameraSettings, "enabled">, password: string, codec: string): Promise<CameraRecord> {
     const added = { ...settings, password, ...(codec ? { codec } : {}) };
     return (await this.#call<{ camera: CameraRecord }>("Add", added)).camera;

@@ -23,7 +23,7 @@ export class FakeSetup {
   readonly mount: MountRecord[] = [];
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
-  /** The answer of a trial. */
+  /** The answer of a probe. */
   probe: unknown = null;
   /** What a new limit deletes. */
   loss: unknown = null;

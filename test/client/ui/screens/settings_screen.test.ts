@@ -30,15 +30,15 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.locator(".nav").textContent()).toBe("LiveEventsMaps");
   });
 
-  test("a camera is added when its picture was seen; a trial can be given up, and fails with a reason", async () => {
+  test("a camera is added when its picture was seen; a test can be given up, and fails with a reason", async () => {
     const page = await open("cameras&open=new");
     await page.getByLabel("Address", { exact: true }).fill("camera-3");
-    await page.getByLabel("Usual paths").selectOption({ index: 1 });
+    await page.getByLabel("Common paths").selectOption({ index: 1 });
     await page.getByLabel("The camera's password").fill("secret");
     await page.route(/Probe/, () => undefined);
-    const tryIt = page.getByRole("button", { name: "Try this camera" });
+    const tryIt = page.getByRole("button", { name: "Test connection" });
     await tryIt.click();
-    await page.getByRole("button", { name: "Cancel the trial" }).click();
+    await page.getByRole("button", { name: "Cancel test" }).click();
     await page.unroute(/Probe/);
     setup.probe = { failed: "refused", message: "It refuses." };
     await tryIt.click();

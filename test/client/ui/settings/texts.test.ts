@@ -19,7 +19,8 @@ test("a stroke paints the rectangle between two hours, in whatever direction it 
     const hours = painted(never, from, to, 2);
     expect([...hours].flatMap((mode, at) => (mode === "2" ? [at] : []))).toEqual(expected);
   }
-  expect(weekText(painted(painted(never, 0, 9, 1), 24, 25, 2))).toBe("10 h always, 2 h on alarm a week");
+  expect(weekText(painted(painted(never, 0, 9, 1), 24, 25, 2))).toBe("each week 10 h always, 2 h on alarm");
+  expect(weekText(never)).toBe("not recorded");
 });
 
 test.each([

@@ -11,8 +11,8 @@ export function withPath(address: string, path: string): string {
 /** A sentence for the user; empty where nothing is wrong. */
 export function addressProblem(address: string): string {
   if (!/^(rtsp|https?):\/\/[^/\s]+/i.test(address)) {
-    return "The address must begin with rtsp://, http:// or https://, then the camera's name or number in the network.";
+    return "The address must begin with rtsp://, http:// or https://, then the camera's host name or IP address.";
   }
   if (/^[a-z]+:\/\/[^/]*@/i.test(address)) return "Please enter account and password in their own fields.";
-  return /\s/.test(address) ? "The address contains a blank." : "";
+  return /\s/.test(address) ? "The address contains a space." : "";
 }

@@ -57,7 +57,7 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
   readonly #setup: CameraSetup;
   #form: RecordForm<CameraSettings, CameraRecord> | null = null;
   #connection: ConnectionFields | null = null;
-  /** As the trial told it. */
+  /** As the probe reported it. */
   #codec = "";
 
   constructor(context: PageContext, id: number | "new") {
@@ -89,14 +89,14 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
 
   #showForm(camera: CameraRecord | null, list: CameraSetupList): void {
     const name = textField("Name", { maxlength: "80" });
-    const enabled = checkField("Switched on", "Off, it is neither shown nor recorded; its footage stays.");
+    const enabled = checkField("Enabled", "When off, it is neither shown nor recorded; its footage stays.");
     const [audio, ptz] = [checkField("Record and play its sound"), checkField("It can pan, tilt and zoom")];
     const profiles = kProfiles.map((text, profile) => [String(profile), text] as const);
     const live = selectField("Stream of the live view", profiles);
     const groups = chipsField("Groups", list.group);
     const plan = new PlanField(list.mount);
     const rest = element("div", { class: "form-group" });
-    const skip = button("Go on without a trial", () => showRest(), "plain");
+    const skip = button("Skip the test", () => showRest(), "plain");
     const showRest = () => {
       rest.hidden = false;
       skip.hidden = true;
@@ -153,10 +153,10 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
         save: (settings, base) => this.#save(settings, base, connection.password),
         describe: {
           name: ["Name", String],
-          enabled: ["Switched on", yesNo],
+          enabled: ["Enabled", yesNo],
           source: ["Addresses", (source) => source.map(({ address }) => address).join(", ")],
           account: ["Account", String],
-          insecure: ["Takes any certificate", yesNo],
+          insecure: ["Accepts any certificate", yesNo],
           audio: ["Sound", yesNo],
           ptz: ["Pans, tilts and zooms", yesNo],
           liveProfile: ["Stream of the live view", (profile) => kProfiles[profile] ?? ""],

@@ -25,7 +25,7 @@ const kRecordingTroubles: Record<string, string> = {
   "disk-fails": "not recorded: the disk fails",
   "mount-gone": "not recorded: the mount is gone",
   "no-mount": "not recorded: there is no mount",
-  "no-event-id": "not recorded: the store gives no numbers",
+  "no-event-id": "not recorded: the record store assigns no event ids",
 };
 
 /** "live", "no signal since 24 Nov 01:45: unreachable". */
@@ -83,9 +83,9 @@ export class CameraRow {
     const of = groups.filter(({ id }) => camera.group.includes(id));
     setText(this.#groups, of.map((group) => group.name).join(", "));
     setText(this.#state, stateText(camera));
-    const flow = state === "running" ? [`${rateNumber(rate)} pictures/s`, `${bytesText(bytes)}/s`] : [];
+    const flow = state === "running" ? [`${rateNumber(rate)} fps`, `${bytesText(bytes)}/s`] : [];
     setText(this.#sends, [codecText(codec), ...flow].join(" · "));
-    setText(this.#plan, trouble || (enabled ? `recorded ${planText(plan)}` : "not recorded"));
+    setText(this.#plan, trouble || (enabled ? planText(plan) : "not recorded"));
     if (footage) setText(this.#footage, footage.bytes > 0 ? `${bytesText(footage.bytes)} of footage` : "no footage");
   }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How a camera is reached: its addresses, its account, and a trial.
+// How a camera is reached: its addresses, its account, and a test of the connection.
 
 import type {
   CameraRecord,
@@ -24,7 +24,7 @@ export class ConnectionFields {
   readonly #camera: CameraRecord | null;
   readonly #probe: ProbePanel;
   readonly #addresses = kProfiles.map((name, profile) =>
-    textField(profile === 0 ? "Address" : `Address of the stream ${name.toLowerCase()}`, {
+    textField(profile === 0 ? "Address" : `${name} stream address`, {
       type: "url",
       inputmode: "url",
       autocapitalize: "none",
@@ -35,8 +35,9 @@ export class ConnectionFields {
   readonly #password: TextField;
   readonly #forget = checkField("Remove the stored password");
   readonly #insecure = checkField(
-    "Take any certificate",
-    "For https:// where nobody vouches for the camera's certificate. Others in your network could then pretend to be it.",
+    "Accept any certificate",
+    "For https:// cameras whose certificate is not signed by a trusted authority. " +
+      "Anyone on your network could then impersonate the camera.",
   );
   #stored: readonly CameraSource[] = [];
 
@@ -48,14 +49,15 @@ export class ConnectionFields {
   ) {
     this.#camera = camera;
     const hasPassword = camera?.hasPassword ?? false;
-    const hint = "Left empty, the stored one stays. It is never shown, nor sent to another address.";
+    const hint =
+      "Leave empty to keep the stored password. It is never shown, and never sent to another host.";
     this.#password = secretField("The camera's password", hasPassword ? hint : "");
     this.#forget.root.hidden = !hasPassword;
     this.#probe = new ProbePanel(setup, () => this.#request(), onResult);
     const [address, ...others] = this.#addresses as [TextField, ...TextField[]];
-    const usual = path.map((one) => [one.path, `${one.name}: ${one.path}`] as const);
-    const why = "If the manual tells no address, one of these often fits.";
-    const paths = selectField("Usual paths", [["", "Choose one to try…"], ...usual], why);
+    const common = path.map((one) => [one.path, `${one.name}: ${one.path}`] as const);
+    const why = "If the manual gives no address, one of these often works.";
+    const paths = selectField("Common paths", [["", "Choose one to try…"], ...common], why);
     paths.root.addEventListener("input", () => {
       if (paths.value) address.value = withPath(address.value, paths.value);
     });

@@ -41,17 +41,17 @@ export function painted(hours: string, from: number, to: number, mode: number): 
     .join("");
 }
 
-/** "always", "never", "98 h always, 70 h on alarm". */
+/** "always", "not recorded", "each week 98 h always, 70 h on alarm". */
 export function weekText(hours: string): string {
   const count = (mode: number) => [...hours].filter((hour) => Number(hour) === mode).length;
   const counts = kHourModes.map((text, mode) => ({ text, count: count(mode) }));
   const used = counts.filter(({ text, count }) => count > 0 && text !== "never");
-  if (used.length === 0) return "never";
+  if (used.length === 0) return "not recorded";
   if (used[0]!.count === kHoursOfWeek) return used[0]!.text;
-  return `${used.map(({ text, count }) => `${count} h ${text}`).join(", ")} a week`;
+  return `each week ${used.map(({ text, count }) => `${count} h ${text}`).join(", ")}`;
 }
 
-/** "08:00 to 09:00 on Monday". */
+/** "Monday, 08:00 to 09:00". */
 export function hourText(at: number): string {
   const two = (hour: number) => `${String(hour).padStart(2, "0")}:00`;
   const hour = at % kHoursOfDay;

@@ -21,7 +21,7 @@ export class PlanField implements Field<RecordingPlan> {
   readonly #grid = new PlanGrid();
   readonly #pre = numberField("Seconds before an alarm", 0, 300);
   readonly #post = numberField("Seconds after an alarm", 0, 300);
-  readonly #segment = numberField("Minutes in one file", 0.16, 60);
+  readonly #segment = numberField("Minutes per file", 0.16, 60);
   readonly #profile = selectField(
     "Recorded stream",
     kProfiles.map((name, profile) => [String(profile), name] as const),
@@ -31,7 +31,7 @@ export class PlanField implements Field<RecordingPlan> {
 
   constructor(mounts: CameraSetupList["mount"]) {
     const names = mounts.map(({ id, name }) => [String(id), name] as const);
-    this.#mount = selectField("Kept on", [["0", "The default mount"], ...names]);
+    this.#mount = selectField("Mount", [["0", "The default mount"], ...names]);
     this.#alarm = formRow(this.#pre, this.#post);
     const files = formRow(this.#segment, this.#profile, this.#mount);
     this.root.append(this.#mode.root, this.#grid.root, this.#alarm, files);

@@ -83,11 +83,12 @@ export class PlanGrid implements Field<string> {
       cell.ariaLabel = `${hourText(at)}: ${kHourModes[mode]}`;
       cell.tabIndex = at === this.#focused ? 0 : -1;
     });
-    this.#status.textContent = `Records ${weekText(this.#hours)}.`;
+    this.#status.textContent = `Recording: ${weekText(this.#hours)}.`;
   }
 
   #tell(at: number): void {
-    this.#status.textContent = `${hourText(at)}: ${kHourModes[Number(this.#hours[at])]}. Records ${weekText(this.#hours)}.`;
+    const mode = kHourModes[Number(this.#hours[at])];
+    this.#status.textContent = `${hourText(at)}: ${mode}. Recording: ${weekText(this.#hours)}.`;
   }
 
   #paint(from: number, to: number, mode = Number(this.#brush.value), before = this.#hours): void {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tries a camera before it is saved: shows its picture and what it sends, or why there is none.
+// Tests the connection to a camera before it is saved: shows its picture and what it sends, or why there is none.
 
 import type { CameraSetup, ProbeRequest, ProbeResult } from "../../../wire/camera_setup";
 import { asServerError } from "../../../wire/server";
@@ -26,8 +26,8 @@ export class ProbePanel {
   readonly #request: () => ProbeRequest;
   readonly #onResult: (result: ProbeResult) => void;
   readonly #shown = element("div", { class: "probe-shown", role: "status" });
-  readonly #start = button("Try this camera", () => void this.#probe());
-  readonly #cancel = button("Cancel the trial", () => this.#running?.abort());
+  readonly #start = button("Test connection", () => void this.#probe());
+  readonly #cancel = button("Cancel test", () => this.#running?.abort());
   #running: AbortController | null = null;
 
   constructor(setup: CameraSetup, request: () => ProbeRequest, onResult: (result: ProbeResult) => void) {
@@ -84,7 +84,7 @@ export class ProbePanel {
   async #show(result: ProbeResult): Promise<void> {
     const { codec, width, height, rate, audio } = result;
     const facts = [codecText(codec), `${width} × ${height}`];
-    if (rate > 0) facts.push(`${rateNumber(rate)} pictures a second`);
+    if (rate > 0) facts.push(`${rateNumber(rate)} fps`);
     facts.push(audio ? "with sound" : "no sound");
     const picture = element("canvas", { class: "probe-picture", role: "img", "aria-label": "The camera's picture" });
     const isShown = await drawBase64(picture, result.picture);

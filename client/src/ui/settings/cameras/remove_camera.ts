@@ -21,10 +21,11 @@ export async function askToRemove(host: HTMLElement, setup: CameraSetup, id: num
   const some = `It has ${counted(events, "event")} with ${bytesText(bytes)} of footage${since}.`;
   const has = events > 0 ? some : "It has no footage.";
   const footage = radioField<"keep" | "remove">("Its footage", [
-    ["keep", "Keep it"],
-    ["remove", "Delete it as well"],
+    ["keep", "Leave it on the disk"],
+    ["remove", "Delete it too"],
   ]);
-  const hint = "Footage that is kept stays until the limits of its mount delete it. Archived events always stay.";
+  const hint =
+    "Footage that is left is deleted once it exceeds the limits of its mount. Kept recordings stay in either case.";
   footage.value = "keep";
   footage.root.hidden = events === 0;
   const removed = await openDialog(host, {
