@@ -35,7 +35,7 @@ await visit(async (page, complaints) => {
   await page.evaluate(() => void (location.hash = "#settings=people&open=new"));
   await page.getByLabel("Name").fill("night");
   await page.getByLabel("Password", { exact: true }).fill(kWord);
-  await page.getByLabel("The same once more").fill(kWord);
+  await page.getByLabel("Repeat password").fill(kWord);
   for (const right of ["Live", "Sound", "Playback"]) await page.getByLabel(`All cameras: ${right}`).click();
   for (const right of ["Live", "Playback"]) await page.getByLabel(`Loading bay: ${right}`).check();
   await page.getByRole("button", { name: "Add the account" }).click();

@@ -23,7 +23,7 @@ export interface Denied extends Record<CameraRight, number[]> {
 /** What a manager may change, apart from the password. */
 export interface UserSettings {
   privilege: Privilege;
-  /** Whether it may report alarms and transactions. */
+  /** Whether it may report alerts and POS transactions. */
   mayMark: boolean;
   deny: Denied;
 }

@@ -71,15 +71,15 @@ export class AccountMenu {
   }
 
   async #changePassword(): Promise<void> {
-    const password = secretField("Your password until now");
+    const password = secretField("Current password");
     const wanted = secretField("New password", "At least eight characters.");
-    const again = secretField("New password once more");
+    const again = secretField("Repeat new password");
     const isDone = await openDialog(this.root.parentElement!, {
       title: "Change your password",
       content: [password.root, wanted.root, again.root],
       submit: "Change",
       attempt: async () => {
-        const problem = password.value ? passwordProblem(wanted.value, again.value) : "Please enter your password until now.";
+        const problem = password.value ? passwordProblem(wanted.value, again.value) : "Please enter your current password.";
         if (problem) return problem;
         await new People(this.#session.server).changePassword(password.value, wanted.value);
         return undefined;

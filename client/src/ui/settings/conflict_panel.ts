@@ -41,8 +41,8 @@ export function conflictPanel<Settings extends object>(
     element(
       "div",
       { class: "form-buttons" },
-      button("Save mine over theirs", choices.keepMine),
-      button("Drop mine, take theirs", choices.takeTheirs),
+      button("Overwrite with mine", choices.keepMine),
+      button("Discard mine", choices.takeTheirs),
     ),
   );
 }

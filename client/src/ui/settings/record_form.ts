@@ -29,7 +29,7 @@ export interface RecordFormParts<Settings extends object, Stored extends Revised
   show(settings: Settings): void;
   /** Fields that are never shown, such as passwords, hold something. */
   hasSecrets(): boolean;
-  /** Stores `settings`, made from `base`; null: the user has changed his mind. Rejects with a ServerError. */
+  /** Stores `settings`, made from `base`; null: the user has changed their mind. Rejects with a ServerError. */
   save(settings: Settings, base: Stored | null): Promise<Stored | null>;
   /** A sentence where the form cannot be saved as it is. */
   problem(settings: Settings): string;
@@ -92,7 +92,7 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
     if (this.#submit.getAttribute("aria-busy") === "true") return;
     const settings = this.#parts.read();
     const invalid = [...this.root.elements].find((field) => field instanceof HTMLInputElement && !field.validity.valid);
-    const problem = this.#parts.problem(settings) || (invalid ? "Please look at this field again." : "");
+    const problem = this.#parts.problem(settings) || (invalid ? "Please check the marked field." : "");
     this.#message.textContent = problem;
     if (problem) return void (invalid as HTMLElement | undefined)?.focus();
     this.#submit.setAttribute("aria-busy", "true");

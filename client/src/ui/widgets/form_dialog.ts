@@ -66,7 +66,7 @@ export function openDialog(host: HTMLElement, { title, content, submit, attempt 
   });
 }
 
-/** Has the user prove again who he is; `attempt` gets the password. */
+/** Asks users for their password again; `attempt` gets it. */
 export function openReauthDialog(
   host: HTMLElement,
   form: Omit<DialogForm, "attempt"> & { attempt(password: string): Promise<void> },

@@ -78,13 +78,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const rows = page.locator(".form-conflict tbody tr");
     await rows.first().waitFor();
     expect(await rows.allInnerTexts()).toEqual(["Name\tGate north\tGate south", "Sound\tnot changed by you\tyes"]);
-    await page.getByRole("button", { name: "Save mine over theirs" }).click();
+    await page.getByRole("button", { name: "Overwrite with mine" }).click();
     await page.getByText("The camera is saved.").waitFor();
     expect(setup.asked, "their other change stays, and so does the password").toEqual([["camera", { id: 2, revision: 7, name: "Gate north" }]]);
     await page.getByLabel("Name").fill("x");
     Object.assign(setup.camera[1]!, { revision: 20, name: "Gate east" });
     await save(page);
-    await page.getByRole("button", { name: "Drop mine" }).click();
+    await page.getByRole("button", { name: "Discard mine" }).click();
     expect(await page.getByLabel("Name").inputValue()).toBe("Gate east");
   }, 20_000);
 
@@ -145,7 +145,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const deny = { ...kNothingDenied, audio: [2], group: { ...kNothingDenied.group, live: [1] } };
     await vi.waitFor(() => expect(setup.asked).toEqual([["user", { id: 2, revision: 1, deny }]]));
     await page.getByLabel("New password").fill("long enough");
-    await page.getByLabel("The same once more").fill("long enough");
+    await page.getByLabel("Repeat password").fill("long enough");
     await save(page);
     const dialog = page.getByRole("dialog", { name: "Change guard" });
     for (const word of ["wrong", "right"]) {

@@ -21,7 +21,8 @@ export class PeoplePage extends LoadedPage<UserList> {
 
   #showList(list: UserList): void {
     const rows = list.user.map((user) => this.#row(user, list));
-    const sentence = "You are alone. Give everyone an account of their own, and only the rights that they need.";
+    const sentence =
+      "Yours is the only account. Give everyone an account of their own, with only the rights they need.";
     const alone = emptyState("people", sentence);
     this.show(element("ul", { class: "settings-list" }, ...rows), ...(list.user.length === 1 ? [alone] : []));
   }
@@ -30,7 +31,7 @@ export class PeoplePage extends LoadedPage<UserList> {
     const { id, name, privilege, sessions, lastUse, deny, mayMark } = user;
     const isOwn = id === this.context.account.user_id;
     const used = lastUse ? `last used ${minuteText(lastUse * 1000)}` : "";
-    const marks = mayMark && privilege === "viewer" ? ", reports alarms" : "";
+    const marks = mayMark && privilege === "viewer" ? ", reports alerts" : "";
     const part = (look: string, ...texts: string[]) =>
       element("div", { class: look }, ...texts.map((text) => element("span", {}, text)));
     const link = element("a", { class: "row-link", href: settingsAddress("people", id) }, name);

@@ -22,7 +22,7 @@ import { RightsMatrix } from "./rights_matrix";
 import { SessionsPanel } from "./sessions_panel";
 
 /** Whoever changed it here would end the own session. */
-const kOwnHint = "Change your own password with the button with the person in the bar.";
+const kOwnHint = "Change your own password in the account menu in the bar.";
 
 type Settings = UserSettings & { name: string };
 
@@ -58,16 +58,16 @@ export class PersonPage extends LoadedPage<UserList> {
   #showForm(list: UserList): void {
     const user = this.#user;
     const name = textField("Name", { maxlength: "64", autocapitalize: "none" }, "Letters, digits and . _ - @");
-    const hint = user ? "Left empty, it stays. A new one ends all sessions of this account." : "At least eight characters.";
-    const password = secretField(user ? "New password" : "Password", hint);
-    const again = secretField("The same once more");
+    const stays = "Leave empty to keep it. A new password ends all sessions of this account.";
+    const password = secretField(user ? "New password" : "Password", user ? stays : "At least eight characters.");
+    const again = secretField("Repeat password");
     const mayMakeOwners = list.user.some((one) => one.id === this.context.account.user_id && one.privilege === "owner");
     const privilege = radioField<UserSettings["privilege"]>("May", [
       ["viewer", "Watch"],
       ["manager", "Watch and set up (manager)"],
       ...(mayMakeOwners || user?.privilege === "owner" ? [["owner", "Everything (owner)"] as const] : []),
     ]);
-    const mayMark = checkField("Report alarms and transactions", "For devices and tills.");
+    const mayMark = checkField("Report alerts and POS transactions", "For devices and cash registers.");
     const rights = new RightsMatrix(list);
     name.root.hidden = user !== null;
     const isOwn = user?.id === this.context.account.user_id;
@@ -99,7 +99,7 @@ export class PersonPage extends LoadedPage<UserList> {
         describe: {
           name: ["Name", String],
           privilege: ["May", (value) => kPrivilegeNames[value]],
-          mayMark: ["Reports alarms", (value) => (value ? "yes" : "no")],
+          mayMark: ["Reports alerts", (value) => (value ? "yes" : "no")],
           deny: ["Sees", (value) => rightsText(value, list)],
         },
         onSaved: (stored) => {
@@ -131,7 +131,7 @@ export class PersonPage extends LoadedPage<UserList> {
     return passwordProblem(password.value, again.value);
   }
 
-  /** Null where the user does not prove who he is. */
+  /** Null where the user does not confirm with their password. */
   async #save(
     settings: Settings,
     base: UserRecord | null,
