@@ -17,7 +17,7 @@
 //     events/     the stage of players with its transport controls; calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     settings/   the sections of the settings: cameras, people, storage, activity. Each has a list and a page of one record
+//     settings/   the sections of the settings: cameras, accounts, storage, audit. Each has a list and a page of one record
 //                 (page, record_form), which notices what others have changed meanwhile (merge, conflict_panel)
 //     widgets/    what all of these use: elements, buttons, icons, fields, dialogs, texts, titles, notices, keys, panning and
 //                 zooming
@@ -48,7 +48,7 @@ import "./style/settings.css";
 import "./style/cameras.css";
 import "./style/people.css";
 import "./style/storage.css";
-import "./style/activity.css";
+import "./style/audit.css";
 import { App } from "./ui/app";
 
 void new App(document.querySelector<HTMLElement>("#app")!).start();

@@ -62,11 +62,11 @@ await visit(async (page, complaints) => {
     ["cameras", "cameras", ".camera-row"],
     ["camera", "cameras&open=1", ".form"],
     ["new-camera", "cameras&open=new", ".form"],
-    ["people", "people", ".person-row"],
-    ["person", "people&open=2", ".rights"],
+    ["accounts", "accounts", ".person-row"],
+    ["account", "accounts&open=2", ".rights"],
     ["storage", "storage", ".mount-card"],
     ["mount", "storage&open=1", ".form"],
-    ["activity", "activity", ".activity-entry, .settings-state"],
+    ["audit", "audit", ".audit-entry, .settings-state"],
   ]) {
     await go(`#settings=${hash}`);
     await look(name, selector);

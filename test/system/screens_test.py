@@ -28,11 +28,11 @@ class ScreensTest(unittest.TestCase):
                 ("cameras", "Cameras", "Settings"),
                 ("camera", "Cameras", None),
                 ("new-camera", "Cameras", None),
-                ("people", "People", "People"),
-                ("person", "People", None),
+                ("accounts", "Accounts", "Accounts"),
+                ("account", "Accounts", None),
                 ("storage", "Storage", "Storage"),
                 ("mount", "Storage", None),
-                ("activity", "Activity", "Activity"),
+                ("audit", "Audit log", "Audit log"),
             ]:
                 seen = visit.see(name)
                 with self.subTest(name):

@@ -32,7 +32,7 @@ await visit(async (page, complaints) => {
   await page.locator('.tile[data-state="live"]', { hasText: "Loading bay" }).waitFor({ timeout: 20_000 });
   await report("on the wall");
 
-  await page.evaluate(() => void (location.hash = "#settings=people&open=new"));
+  await page.evaluate(() => void (location.hash = "#settings=accounts&open=new"));
   await page.getByLabel("Name").fill("night");
   await page.getByLabel("Password", { exact: true }).fill(kWord);
   await page.getByLabel("Repeat password").fill(kWord);
@@ -42,12 +42,12 @@ await visit(async (page, complaints) => {
   await page.getByLabel("Your own password").fill(password);
   await page.getByRole("button", { name: "Add", exact: true }).click();
   await page.locator(".person-row", { hasText: "night" }).waitFor();
-  await page.screenshot({ path: `${folder}/people.png` });
+  await page.screenshot({ path: `${folder}/accounts.png` });
   await report("account", { word: kWord, row: await page.locator(".person-row", { hasText: "night" }).innerText() });
 
-  await page.evaluate(() => void (location.hash = "#settings=activity"));
-  await page.locator(".activity-entry").first().waitFor();
-  await report("activity", { entries: await page.locator(".activity-what").allInnerTexts() });
+  await page.evaluate(() => void (location.hash = "#settings=audit"));
+  await page.locator(".audit-entry").first().waitFor();
+  await report("audit", { entries: await page.locator(".audit-what").allInnerTexts() });
 
   await page.getByRole("button", { name: "Account admin" }).click();
   await page.getByRole("button", { name: "Log out" }).click();

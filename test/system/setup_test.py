@@ -44,7 +44,7 @@ class SetupTest(unittest.TestCase):
             self.assertEqual(self.kinds(server, camera["id"], session), {"image"})
             self.assertEqual(self.kinds(server, camera["id"], server.session("admin")), {"image", "audio"})
             wanted = ["Account added: night (", "Camera added: Loading bay ("]
-            entries = visit.see("activity")["entries"]
+            entries = visit.see("audit")["entries"]
             self.assertEqual([entry[: len(text)] for entry, text in zip(entries, wanted)], wanted)
             self.assertNotIn(account["word"], json.dumps(server.request(
                 call("VEXO.System", "Audit"), "admin", body="{}", headers=headers).json))

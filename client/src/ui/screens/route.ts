@@ -12,7 +12,7 @@ import type { FootageRef } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
-export const kSettingsSections = ["cameras", "people", "storage", "activity"] as const;
+export const kSettingsSections = ["cameras", "accounts", "storage", "audit"] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;

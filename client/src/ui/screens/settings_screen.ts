@@ -2,12 +2,12 @@
 //
 // The settings' screen, for managers: its sections, and in each a list or one record of it.
 
-import { ActivityPage } from "../settings/activity/activity_page";
+import { AuditPage } from "../settings/audit/audit_page";
 import { CameraPage } from "../settings/cameras/camera_page";
 import { CamerasPage } from "../settings/cameras/cameras_page";
 import { noRightState, type Page, type PageContext } from "../settings/page";
-import { PeoplePage } from "../settings/people/people_page";
-import { PersonPage } from "../settings/people/person_page";
+import { AccountsPage } from "../settings/accounts/accounts_page";
+import { AccountPage } from "../settings/accounts/account_page";
 import { MountPage } from "../settings/storage/mount_page";
 import { StoragePage } from "../settings/storage/storage_page";
 import { element } from "../widgets/dom";
@@ -19,21 +19,21 @@ import { Screen, type Kept, type Session } from "./screen";
 
 const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {
   cameras: ["Cameras", "camera"],
-  people: ["People", "people"],
+  accounts: ["Accounts", "people"],
   storage: ["Storage", "storage"],
-  activity: ["Activity", "activity"],
+  audit: ["Audit log", "audit"],
 };
 
 const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
   cameras: CamerasPage,
-  people: PeoplePage,
+  accounts: AccountsPage,
   storage: StoragePage,
-  activity: ActivityPage,
+  audit: AuditPage,
 };
 
 const kRecords: Partial<Record<SettingsSection, new (context: PageContext, id: number | "new") => Page>> = {
   cameras: CameraPage,
-  people: PersonPage,
+  accounts: AccountPage,
   storage: MountPage,
 };
 

@@ -3,7 +3,7 @@
 // The settings in a real browser: nothing that was typed is lost, nobody's change is lost unseen, and nothing is deleted unasked.
 
 import type { Page } from "playwright-core";
-import { kNothingDenied } from "../../../../client/src/ui/settings/people/rights";
+import { kNothingDenied } from "../../../../client/src/ui/settings/accounts/rights";
 import { cameraRecord } from "../../support/fake_setup";
 import { hasBrowser, ServedClient } from "../../support/served_client";
 
@@ -25,7 +25,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
 
   test("who is no manager has no settings", async () => {
     client.server.isManager = false;
-    const page = await open("people");
+    const page = await open("accounts");
     await page.getByText("Only managers").waitFor();
     expect(await page.locator(".nav").textContent()).toBe("LiveEventsMaps");
   });
@@ -137,7 +137,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   }, 20_000);
 
   test("rights are stored as what is denied; a new password takes the manager's own", async () => {
-    const page = await open("people&open=2");
+    const page = await open("accounts&open=2");
     await page.getByLabel("All cameras: Sound").click();
     await page.getByLabel("Entrance: Sound").click();
     await page.getByLabel("Group Outside: Live").click();

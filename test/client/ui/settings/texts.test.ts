@@ -2,11 +2,11 @@
 //
 // What the settings tell in words, and what they make of two changes at the same time.
 
-import { actionText, changesOf } from "../../../../client/src/ui/settings/activity/audit_text";
+import { actionText, changesOf } from "../../../../client/src/ui/settings/audit/audit_text";
 import { addressProblem, withPath } from "../../../../client/src/ui/settings/cameras/address";
 import { painted, weekText } from "../../../../client/src/ui/settings/cameras/plan";
 import { differences, isSame, merged } from "../../../../client/src/ui/settings/merge";
-import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/people/rights";
+import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/accounts/rights";
 import { limitsEffect } from "../../../../client/src/ui/settings/storage/storage_text";
 import { bytesText, daysText } from "../../../../client/src/ui/widgets/amounts";
 

@@ -28,14 +28,14 @@ type Settings = UserSettings & { name: string };
 
 const kFirstSettings: Settings = { name: "", privilege: "viewer", mayMark: false, deny: kNothingDenied };
 
-export class PersonPage extends LoadedPage<UserList> {
+export class AccountPage extends LoadedPage<UserList> {
   readonly #people: People;
   #form: RecordForm<Settings, UserRecord> | null = null;
   #user: UserRecord | null = null;
 
   constructor(context: PageContext, id: number | "new") {
     super(context, id === "new" ? "Add an account" : "Account");
-    this.linkBack("All accounts", settingsAddress("people"));
+    this.linkBack("All accounts", settingsAddress("accounts"));
     this.#people = new People(context.server);
     void this.start(
       () => this.#people.list(),

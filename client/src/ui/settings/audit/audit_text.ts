@@ -6,7 +6,7 @@ import type { AuditedState, AuditEntry } from "../../../wire/audit";
 import { weekText } from "../cameras/plan";
 
 /** Where the user knows it by another name. */
-const kAreas: Record<string, string> = { user: "account", emap: "map", io: "I/O module" };
+const kAreas: Record<string, string> = { user: "account" };
 const kVerbs: Record<string, string> = {
   add: "added",
   set: "changed",

@@ -10,9 +10,9 @@ import { minuteText } from "../../widgets/text";
 import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
 import { kPrivilegeNames, rightsSummary } from "./rights";
 
-export class PeoplePage extends LoadedPage<UserList> {
+export class AccountsPage extends LoadedPage<UserList> {
   constructor(context: PageContext) {
-    super(context, "People", linkButton("Add an account", settingsAddress("people", "new"), true));
+    super(context, "Accounts", linkButton("Add an account", settingsAddress("accounts", "new"), true));
     void this.start(
       () => new People(context.server).list(),
       (list) => this.#showList(list),
@@ -34,7 +34,7 @@ export class PeoplePage extends LoadedPage<UserList> {
     const marks = mayMark && privilege === "viewer" ? ", reports alerts" : "";
     const part = (look: string, ...texts: string[]) =>
       element("div", { class: look }, ...texts.map((text) => element("span", {}, text)));
-    const link = element("a", { class: "row-link", href: settingsAddress("people", id) }, name);
+    const link = element("a", { class: "row-link", href: settingsAddress("accounts", id) }, name);
     return element(
       "li",
       { class: "person-row" },

@@ -13,18 +13,18 @@ import { actionText, changesOf } from "./audit_text";
 
 type Entries = Awaited<ReturnType<typeof auditEntries>>;
 
-export class ActivityPage extends LoadedPage<Entries> {
-  readonly #list = element("ol", { class: "settings-list activity" });
+export class AuditPage extends LoadedPage<Entries> {
+  readonly #list = element("ol", { class: "settings-list audit" });
   readonly #older = button("Older", () => void this.#loadOlder());
   #oldest: number | undefined;
 
   constructor(context: PageContext) {
-    super(context, "Activity");
+    super(context, "Audit log");
     void this.start(
       () => auditEntries(context.server),
       (entries) => {
         const isEmpty = entries.entry.length === 0;
-        if (isEmpty) return this.show(emptyState("activity", "Nobody has changed anything yet."));
+        if (isEmpty) return this.show(emptyState("audit", "Nobody has changed anything yet."));
         this.#append(entries);
         this.show(this.#list, element("div", { class: "form-buttons" }, this.#older));
       },
@@ -53,16 +53,16 @@ export class ActivityPage extends LoadedPage<Entries> {
 
 function entryRow(entry: AuditEntry): HTMLElement {
   const { time, who, address, action, object } = entry;
-  const at = element("time", { class: "activity-time quiet" }, `${shortDate(time * 1000)} ${clockTime(time * 1000)}`);
-  const what = element("span", { class: "activity-what" }, `${actionText(action)}: `, element("strong", {}, object));
-  const by = element("span", { class: "quiet activity-who" }, address ? `${who}, from ${address}` : who);
+  const at = element("time", { class: "audit-time quiet" }, `${shortDate(time * 1000)} ${clockTime(time * 1000)}`);
+  const what = element("span", { class: "audit-what" }, `${actionText(action)}: `, element("strong", {}, object));
+  const by = element("span", { class: "quiet audit-who" }, address ? `${who}, from ${address}` : who);
   const changes = changesOf(entry).map(({ name, before, after }) => {
     const cell = (text: string) => element("td", {}, text || "–");
     return element("tr", {}, element("th", { scope: "row" }, name), cell(before), cell(after));
   });
   const heads = ["Setting", "Before", "After"];
-  const entryOf = (content: HTMLElement) => element("li", { class: "activity-entry" }, content);
-  if (changes.length === 0) return entryOf(element("div", { class: "activity-line" }, at, what, by));
-  const summary = element("summary", { class: "activity-line" }, at, what, by);
+  const entryOf = (content: HTMLElement) => element("li", { class: "audit-entry" }, content);
+  if (changes.length === 0) return entryOf(element("div", { class: "audit-line" }, at, what, by));
+  const summary = element("summary", { class: "audit-line" }, at, what, by);
   return entryOf(element("details", {}, summary, scrolled("What was changed", plainTable(heads, changes))));
 }
