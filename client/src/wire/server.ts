@@ -48,6 +48,7 @@ export interface Snapshot {
 export const kVideoTypeMjpeg = 1;
 
 const kAnswerTimeoutMs = 20_000;
+const kTooManyAttempts = "Too many attempts. Please wait a minute.";
 
 /** A request that failed; `message` is for the user. */
 export class ServerError extends Error {
@@ -67,6 +68,11 @@ interface Failure {
   error?: { code?: number; message?: string; data?: unknown };
 }
 
+/** "try again in a moment": "Try again in a moment." */
+function sentenceOf(words: string): string {
+  return `${words.charAt(0).toUpperCase()}${words.slice(1).replace(/\.$/, "")}.`;
+}
+
 function sentenceFor(status: number, serverMessage: string | undefined): string {
   switch (status) {
     case 0:
@@ -74,7 +80,7 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
     case 401:
       return "You are not logged in.";
     case 429:
-      return "Too many attempts. Please wait a minute.";
+      return serverMessage ? sentenceOf(serverMessage) : kTooManyAttempts;
     case 503:
       return "The server is busy.";
     case 504:
@@ -122,9 +128,9 @@ export class Server {
     try {
       return await this.call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true });
     } catch (error) {
-      if (error instanceof ServerError && error.status === 401) {
-        throw new ServerError(401, error.code, "The account or the password is wrong.");
-      }
+      const { status, code } = asServerError(error);
+      if (status === 401) throw new ServerError(status, code, "The account or the password is wrong.");
+      if (status === 429) throw new ServerError(status, code, kTooManyAttempts);
       throw error;
     }
   }
