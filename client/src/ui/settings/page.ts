@@ -122,8 +122,23 @@ export function linkButton(label: string, href: string, isPrimary = false): HTML
   return element("a", { class: isPrimary ? "button primary" : "button", href }, label);
 }
 
-export function button(label: string, onClick: () => void, look = ""): HTMLButtonElement {
+export function button(label: string, onClick: (made: HTMLButtonElement) => void, look = ""): HTMLButtonElement {
   const made = element("button", { type: "button", class: `button ${look}`.trim() }, label);
-  made.addEventListener("click", onClick);
+  made.addEventListener("click", () => onClick(made));
   return made;
+}
+
+/** The button takes no clicks until `work` is done, which a second one would begin again. */
+export async function whileBusy<Result>(pressed: HTMLButtonElement, work: Promise<Result>): Promise<Result> {
+  const hadFocus = document.activeElement === pressed;
+  pressed.setAttribute("aria-busy", "true");
+  pressed.disabled = true;
+  try {
+    return await work;
+  } finally {
+    pressed.removeAttribute("aria-busy");
+    pressed.disabled = false;
+    // Disabled buttons lose it.
+    if (hadFocus) pressed.focus();
+  }
 }

@@ -86,6 +86,11 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await save(page);
     await page.getByRole("button", { name: "Discard mine" }).click();
     expect(await page.getByLabel("Name").inputValue()).toBe("Gate east");
+    let lists = 0;
+    await page.route(/Camera&version=1&method=List/, (route) => ((lists += 1), route.continue()));
+    await page.getByRole("button", { name: "Remove this camera…" }).dblclick();
+    await page.getByRole("dialog", { name: "Remove Gate east?" }).waitFor();
+    expect(lists, "a second click opens no second dialog").toBe(1);
   }, 20_000);
 
   test("what was typed outlives a server that is away, a change of mind and the end of the session, but for passwords", async () => {

@@ -117,7 +117,8 @@ export class AccountPage extends LoadedPage<UserList> {
     this.show(this.#form.root);
     if (!user) return name.input.focus();
     this.title = user.name;
-    const showIt = () => void showPreview(this.root, this.#people, this.#user!, this.isChanged);
+    const showIt = (pressed: HTMLButtonElement) =>
+      void showPreview(this.root, this.#people, this.#user!, this.isChanged, pressed);
     const preview = button("See as this account", showIt, "plain");
     const sessions = formPart("Sessions", new SessionsPanel(this.#people, user.id).root);
     const remove = button("Remove this account…", () => void this.#remove(), "plain");

@@ -8,16 +8,19 @@ import { element } from "../../widgets/dom";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { plainTable, scrolled } from "../../widgets/table";
+import { whileBusy } from "../page";
 import { kRightNames } from "./rights";
 
-/** `isChanged`: what is shown is stored, and the form holds something else. */
+/** `isChanged`: what is shown is stored, and the form holds something else. `pressed` is busy until there is something to show. */
 export async function showPreview(
   host: HTMLElement,
   people: People,
   { id, name }: UserRecord,
   isChanged: boolean,
+  pressed: HTMLButtonElement,
 ): Promise<void> {
-  const cameras = await people.preview(id).catch((error: unknown) => void notify(asServerError(error).message));
+  const asked = people.preview(id).catch((error: unknown) => void notify(asServerError(error).message));
+  const cameras = await whileBusy(pressed, asked);
   if (!cameras) return;
   const rows = cameras.map((camera) => {
     const cells = kCameraRights.map((right) => element("td", {}, camera[right] ? "yes" : "–"));

@@ -181,7 +181,7 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
     }
     this.title = camera.name;
     const state = element("p", { class: "quiet" }, stateText(camera));
-    const remove = button("Remove this camera…", () => void this.#remove(camera.id), "plain");
+    const remove = button("Remove this camera…", (pressed) => void this.#remove(camera.id, pressed), "plain");
     this.show(state, this.#form.root, formPart("Remove", remove));
   }
 
@@ -203,7 +203,7 @@ export class CameraPage extends LoadedPage<CameraSetupList> {
     return this.#setup.add(added, password ?? "", this.#codec);
   }
 
-  async #remove(id: number): Promise<void> {
-    if (await askToRemove(this.root, this.#setup, id)) this.context.done();
+  async #remove(id: number, pressed: HTMLButtonElement): Promise<void> {
+    if (await askToRemove(this.root, this.#setup, id, pressed)) this.context.done();
   }
 }

@@ -10,10 +10,20 @@ import { radioField } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { minuteText } from "../../widgets/text";
+import { whileBusy } from "../page";
 
-/** Whether it is removed. What it has is asked for anew, so that the user decides on what is there now. */
-export async function askToRemove(host: HTMLElement, setup: CameraSetup, id: number): Promise<boolean> {
-  const list = await setup.list({ footage: true }).catch((error: unknown) => void notify(asServerError(error).message));
+/**
+ * Whether it is removed. What it has is asked for anew, so that the user decides on what is there now; `pressed` is busy until
+ * that is known.
+ */
+export async function askToRemove(
+  host: HTMLElement,
+  setup: CameraSetup,
+  id: number,
+  pressed: HTMLButtonElement,
+): Promise<boolean> {
+  const asked = setup.list({ footage: true }).catch((error: unknown) => void notify(asServerError(error).message));
+  const list = await whileBusy(pressed, asked);
   const camera = list?.camera.find((one) => one.id === id);
   if (!camera) return list !== undefined;
   const { events, bytes, oldest } = camera.footage ?? { events: 0, bytes: 0, oldest: null };
