@@ -5,10 +5,11 @@
 import type { ExportPlan, Footage, Recordings } from "../../wire/recordings";
 import { ServerError, type Camera } from "../../wire/server";
 import type { Span } from "../timeline/span_handles";
+import { bytesText } from "../widgets/amounts";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
-import { calendarDate, clockTime, sizeText, spanInWords } from "../widgets/text";
+import { calendarDate, clockTime, spanInWords } from "../widgets/text";
 
 const kSettleMs = 300;
 const kAroundMs = 60_000;
@@ -37,7 +38,7 @@ export class ExportPanel {
     this.#changed = changed;
     for (const input of [this.#from, this.#to]) input.addEventListener("change", () => this.#readInputs());
     this.#event.addEventListener("click", () => this.#footage && this.setSpan(spanOf(this.#footage), true));
-    const close = iconButton("close", "Do not export", () => this.close());
+    const close = iconButton("close", "Close export", () => this.close());
     const times = element("div", { class: "export-times" }, this.#from, "–", this.#to, this.#event);
     const end = element("div", { class: "export-end" }, this.#about, this.#start, close);
     this.root.append(times, this.#cameraRow, end);
@@ -102,8 +103,8 @@ export class ExportPanel {
     const { fromMs, toMs } = this.#span;
     if (this.#chosen.size === 0) return this.#tell("Choose a camera.");
     if (this.#chosen.size > kMaxCameras) return this.#tell(`Choose at most ${kMaxCameras} cameras.`);
-    if (toMs - fromMs > kMaxSpanMs) return this.#tell("Choose at most a day.");
-    this.#tell("Measuring…");
+    if (toMs - fromMs > kMaxSpanMs) return this.#tell("Choose at most one day.");
+    this.#tell("Calculating the size…");
     this.#timer = setTimeout(() => void this.#plan(this.#span, [...this.#chosen]), kSettleMs);
   }
 
@@ -119,7 +120,7 @@ export class ExportPanel {
     } catch (error) {
       if (isStale()) return;
       const isNothing = error instanceof ServerError && error.status === 404;
-      this.#tell(isNothing ? "Nothing of this time is recorded." : error instanceof ServerError ? error.message : String(error));
+      this.#tell(isNothing ? "Nothing was recorded in this time." : error instanceof ServerError ? error.message : String(error));
     }
   }
 }
@@ -133,10 +134,10 @@ function inputText(ms: number): string {
   return `${calendarDate(ms)}T${clockTime(ms)}`;
 }
 
-/** "5 min · about 120 MB · 2 files · Parking lacks 12 s". */
+/** "5 min · about 120 MB · 2 files in a ZIP · 12 s of Parking missing". */
 function aboutText({ sizeBytes, files, missing }: ExportPlan, spanS: number): string {
-  const parts = [spanInWords(spanS), `about ${sizeText(sizeBytes)}`];
+  const parts = [spanInWords(spanS), `about ${bytesText(sizeBytes)}`];
   if (files > 1) parts.push(`${files} files in a ZIP`);
-  for (const { camera, seconds } of missing) parts.push(`${camera} lacks ${spanInWords(seconds)}`);
+  for (const { camera, seconds } of missing) parts.push(`${spanInWords(seconds)} of ${camera} missing`);
   return parts.join(" · ");
 }

@@ -3,13 +3,14 @@
 // The padlock at the player: says whether what plays is kept, why and by whom, and lets a manager change it.
 
 import { isSameFootage, type Footage, type Recordings } from "../../wire/recordings";
-import { ServerError } from "../../wire/server";
+import { asServerError, ServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { notify } from "../widgets/notice";
 
-const kMaxNote = 120;
+const kMaxNoteCharacters = 120;
+const kEffect = "A kept recording is not deleted, whatever the limits of its mount, until it is released.";
 
 export class KeepButton {
   readonly root = iconButton("notKept", "Keep this recording", () => this.#open());
@@ -17,11 +18,13 @@ export class KeepButton {
   readonly #recordings: Recordings;
   readonly #isManager: boolean;
   readonly #changed: (footage: Footage) => void;
-  readonly #note = element("input", { class: "input", id: "keep-note", maxlength: String(kMaxNote), autocomplete: "off" });
+  readonly #note = element("input", { class: "input", id: "keep-note", maxlength: String(kMaxNoteCharacters), autocomplete: "off" });
   readonly #error = element("p", { class: "alarm", role: "alert" });
   /** What plays, as it was looked up; null until that is known. */
   #footage: Footage | null = null;
   #asked: Footage | null = null;
+  /** Why it could not be looked up; empty where it could. */
+  #failure = "";
 
   /** `changed` is called with what was kept or released. */
   constructor(recordings: Recordings, isManager: boolean, changed: (footage: Footage) => void) {
@@ -38,14 +41,16 @@ export class KeepButton {
     if (footage ? isSameFootage(footage, this.#asked) : !this.#asked) return;
     this.#asked = footage;
     this.#footage = null;
+    this.#failure = "";
     this.#showState();
     if (footage) void this.#lookUp(footage);
   }
 
   async #lookUp(footage: Footage): Promise<void> {
-    const found = await this.#recordings.find(footage).catch(() => null);
+    const found = await this.#recordings.find(footage).catch(asServerError);
     if (!isSameFootage(footage, this.#asked)) return;
-    this.#footage = found;
+    this.#failure = found instanceof ServerError ? found.message : "";
+    this.#footage = found instanceof ServerError ? null : found;
     this.#showState();
   }
 
@@ -58,7 +63,7 @@ export class KeepButton {
     this.root.disabled = !this.#footage || !this.#isManager;
     this.root.dataset["kept"] = String(isKept);
     this.root.setAttribute("aria-label", label);
-    this.root.title = label;
+    this.root.title = this.#failure || label;
   }
 
   #open(): void {
@@ -76,7 +81,7 @@ export class KeepButton {
     const form = element(
       "form",
       { class: "dialog-form" },
-      element("p", { class: "quiet" }, "A kept recording is not deleted when its disk or its time is full, until it is released."),
+      element("p", { class: "quiet" }, kEffect),
       element("label", { for: "keep-note" }, "Note"),
       this.#note,
       this.#error,
@@ -104,7 +109,7 @@ export class KeepButton {
       this.dialog.close();
       notify(isKept ? "The recording is kept." : "The recording is no longer kept.");
     } catch (error) {
-      setText(this.#error, error instanceof ServerError ? error.message : String(error));
+      setText(this.#error, asServerError(error).message);
     }
     this.#changed(footage);
     await this.#lookUp(footage);

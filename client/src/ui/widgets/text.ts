@@ -59,12 +59,6 @@ export function spanInWords(seconds: number): string {
   return minutes > 0 ? `${minutes} min` : `${Math.round(seconds)} s`;
 }
 
-/** "120 MB", "4.2 GB". */
-export function sizeText(bytes: number): string {
-  const megabytes = Math.max(1, Math.round(bytes / 1e6));
-  return megabytes < 1000 ? `${megabytes} MB` : `${(bytes / 1e9).toFixed(1)} GB`;
-}
-
 /** "½×" for slow motion by a factor of two, "4×" for four times as fast. */
 export function rateText(rate: number): string {
   const slow: Record<number, string> = { [-2]: "½", [-4]: "¼", [-8]: "⅛" };
