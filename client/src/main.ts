@@ -2,8 +2,9 @@
 //
 // Starts the web client. Where things are:
 //
-//   wire/      the network: the web API (server, recordings, emaps; for managers camera_setup, people, mounts, audit), the
-//              parts of an endless answer (multipart), requests that end in time (deadline) and take turns (semaphore)
+//   wire/      the network: the web API (server, recordings, exports, emaps; for managers camera_setup, people, mounts,
+//              audit), the parts of an endless answer (multipart), requests that end in time (deadline) and take turns
+//              (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.

@@ -75,14 +75,6 @@ export interface FrameStart {
   from?: number;
 }
 
-/** What an export will be. */
-export interface ExportPlan {
-  sizeBytes: number;
-  files: number;
-  /** Of the cameras that were not recorded all the time, how much there is not. */
-  missing: { camera: string; seconds: number }[];
-}
-
 /** A place in the order of events, and which events are looked for from there. */
 export interface EventPlace {
   cameras: readonly number[];
@@ -126,11 +118,6 @@ interface RawMark {
   reported_by: string;
   text: string[];
   archived?: boolean;
-}
-
-interface RawPlan {
-  size_bytes: number;
-  camera: { name: string; file: unknown[]; gap: { begin: { utc: string }; end: { utc: string } }[] }[];
 }
 
 interface RawHistory {
@@ -204,12 +191,6 @@ export class Recordings {
     const asked = { ...span, kept: "true", cameralists: cameras.join() };
     const { event } = await this.#server.call<{ event: (RawEvent & { camera_id: number })[] }>("VEXO.Event", "List", asked);
     return event.map((one) => footageOf(one, one.camera_id));
-  }
-
-  /** Keeps the recordings of the footage, or gives them back to retention. For managers. */
-  async keep({ kind, id }: FootageRef, isKept: boolean, note: string): Promise<void> {
-    const form = { event: String(id), ...kindParameter(kind), keep: String(isKept), note };
-    await this.#server.call<unknown>("VEXO.Event", "Keep", {}, { form });
   }
 
   async groups(): Promise<Group[]> {
@@ -292,28 +273,6 @@ export class Recordings {
   async setRate(key: number, rate: number): Promise<void> {
     await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
   }
-
-  /** The file is named after its start in this browser's time zone. */
-  downloadAddress({ kind, id, start }: Footage): string {
-    return address("VEXO.Event", "Download", { event: String(id), ...kindParameter(kind), ...zoneAt(start) });
-  }
-
-  /** Rejects with status 404 where nothing of it is recorded. */
-  async planExport(cameras: readonly number[], fromS: number, toS: number): Promise<ExportPlan> {
-    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
-    const { size_bytes, camera } = await this.#server.call<RawPlan>("VEXO.Event", "PlanExport", asked);
-    const missing = camera.map(({ name, gap }) => ({
-      camera: name,
-      seconds: gap.reduce((sum, { begin, end }) => sum + (Date.parse(end.utc) - Date.parse(begin.utc)) / 1000, 0),
-    }));
-    const files = camera.reduce((sum, { file }) => sum + file.length, 0);
-    return { sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
-  }
-
-  exportAddress(cameras: readonly number[], fromS: number, toS: number): string {
-    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
-    return address("VEXO.Event", "Export", { ...asked, ...zoneAt(fromS) });
-  }
 }
 
 function footageOf(raw: RawEvent, camera: number): Footage {
@@ -353,12 +312,7 @@ function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, te
   };
 }
 
-/** This browser's time zone at that time, for names and times in files. */
-function zoneAt(unixS: number): Record<string, string> {
-  return { utc_offset_min: String(-new Date(unixS * 1000).getTimezoneOffset()) };
-}
-
 /** The server takes no kind for a recorded event. */
-function kindParameter(kind: FootageKind): Record<string, string> {
+export function kindParameter(kind: FootageKind): Record<string, string> {
   return kind === "event" ? {} : { kind };
 }

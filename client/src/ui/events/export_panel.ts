@@ -2,7 +2,8 @@
 //
 // Chooses what to take away as a file: a span and cameras. Says how long and how large that is, and what is missing.
 
-import type { ExportPlan, Footage, Recordings } from "../../wire/recordings";
+import type { ExportPlan, Exports } from "../../wire/exports";
+import type { Footage } from "../../wire/recordings";
 import { ServerError, type Camera } from "../../wire/server";
 import type { Span } from "../timeline/span_handles";
 import { bytesText } from "../widgets/amounts";
@@ -19,7 +20,7 @@ const kMaxSpanMs = 86_400_000;
 
 export class ExportPanel {
   readonly root = element("section", { class: "export-panel", "aria-label": "Export", hidden: true });
-  readonly #recordings: Recordings;
+  readonly #exports: Exports;
   readonly #changed: (span: Span | null) => void;
   readonly #from = element("input", { class: "input", type: "datetime-local", step: "1", "aria-label": "From" });
   readonly #to = element("input", { class: "input", type: "datetime-local", step: "1", "aria-label": "To" });
@@ -33,8 +34,8 @@ export class ExportPanel {
   #timer: ReturnType<typeof setTimeout> | undefined;
 
   /** `changed` is called with the span that is to be shown, null once the panel is closed. */
-  constructor(recordings: Recordings, changed: (span: Span | null) => void) {
-    this.#recordings = recordings;
+  constructor(exports: Exports, changed: (span: Span | null) => void) {
+    this.#exports = exports;
     this.#changed = changed;
     for (const input of [this.#from, this.#to]) input.addEventListener("change", () => this.#readInputs());
     this.#event.addEventListener("click", () => this.#footage && this.setSpan(spanOf(this.#footage), true));
@@ -112,11 +113,11 @@ export class ExportPanel {
     const isStale = () => span !== this.#span || !this.isOpen || String(cameras) !== String([...this.#chosen]);
     const [fromS, toS] = [Math.floor(span.fromMs / 1000), Math.ceil(span.toMs / 1000)];
     try {
-      const plan = await this.#recordings.planExport(cameras, fromS, toS);
+      const plan = await this.#exports.plan(cameras, fromS, toS);
       if (isStale()) return;
       setText(this.#about, aboutText(plan, toS - fromS));
       this.#start.removeAttribute("aria-disabled");
-      this.#start.href = this.#recordings.exportAddress(cameras, fromS, toS);
+      this.#start.href = this.#exports.address(cameras, fromS, toS);
     } catch (error) {
       if (isStale()) return;
       const isNothing = error instanceof ServerError && error.status === 404;

@@ -2,6 +2,7 @@
 //
 // The padlock at the player: says whether what plays is kept, why and by whom, and lets a manager change it.
 
+import type { Exports } from "../../wire/exports";
 import { isSameFootage, type Footage, type Recordings } from "../../wire/recordings";
 import { asServerError, ServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
@@ -16,6 +17,7 @@ export class KeepButton {
   readonly root = iconButton("notKept", "Keep this recording", () => this.#open());
   readonly dialog = element("dialog", { class: "dialog", "aria-labelledby": "keep-title" });
   readonly #recordings: Recordings;
+  readonly #exports: Exports;
   readonly #isManager: boolean;
   readonly #changed: (footage: Footage) => void;
   readonly #note = element("input", { class: "input", id: "keep-note", maxlength: String(kMaxNoteCharacters), autocomplete: "off" });
@@ -27,8 +29,9 @@ export class KeepButton {
   #failure = "";
 
   /** `changed` is called with what was kept or released. */
-  constructor(recordings: Recordings, isManager: boolean, changed: (footage: Footage) => void) {
+  constructor(recordings: Recordings, exports: Exports, isManager: boolean, changed: (footage: Footage) => void) {
     this.#recordings = recordings;
+    this.#exports = exports;
     this.#isManager = isManager;
     this.#changed = changed;
     this.root.append(icon("kept"));
@@ -105,7 +108,7 @@ export class KeepButton {
 
   async #change(footage: Footage, isKept: boolean): Promise<void> {
     try {
-      await this.#recordings.keep(footage, isKept, this.#note.value.trim());
+      await this.#exports.keep(footage, isKept, this.#note.value.trim());
       this.dialog.close();
       notify(isKept ? "The recording is kept." : "The recording is no longer kept.");
     } catch (error) {

@@ -5,7 +5,8 @@
 import type { EventWalk } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
 import type { SyncPlayback } from "../../playback/sync_playback";
-import type { Footage, Recordings } from "../../wire/recordings";
+import { downloadAddress } from "../../wire/exports";
+import type { Footage } from "../../wire/recordings";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -27,7 +28,6 @@ export interface TransportActions {
 export class Transport {
   readonly root: HTMLElement;
   readonly #playback: SyncPlayback;
-  readonly #recordings: Recordings;
   readonly #walk: EventWalk;
   readonly #nameOf: (camera: number) => string;
   readonly #keeping: KeepButton;
@@ -42,7 +42,6 @@ export class Transport {
 
   constructor(
     playback: SyncPlayback,
-    recordings: Recordings,
     walk: EventWalk,
     nameOf: (camera: number) => string,
     keeping: KeepButton,
@@ -50,7 +49,6 @@ export class Transport {
   ) {
     this.#keeping = keeping;
     this.#playback = playback;
-    this.#recordings = recordings;
     this.#walk = walk;
     this.#nameOf = nameOf;
     this.#before = iconButton("eventBefore", "Previous event", () => actions.skip(-1));
@@ -100,7 +98,7 @@ export class Transport {
     const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
     setText(this.#frame, footage ? `frame ${(lead?.player.index ?? 0) + 1}${frames}` : "");
     this.#keeping.show(footage);
-    if (footage) this.#download.href = this.#recordings.downloadAddress(footage);
+    if (footage) this.#download.href = downloadAddress(footage);
     else this.#download.removeAttribute("href");
   }
 

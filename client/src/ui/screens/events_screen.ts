@@ -8,6 +8,7 @@ import { FootageCache } from "../../playback/footage_cache";
 import { kRates } from "../../playback/player_state";
 import { RecordedDays } from "../../playback/recorded_days";
 import { SyncPlayback } from "../../playback/sync_playback";
+import { Exports } from "../../wire/exports";
 import { isSameFootage, Recordings, type EventPlace, type Footage } from "../../wire/recordings";
 import { ServerError, type Camera } from "../../wire/server";
 import { Calendar } from "../events/calendar";
@@ -44,6 +45,7 @@ const kPanels = { list: "Events", calendar: "Calendar", timeline: "Timeline", fi
 
 export class EventsScreen extends Screen {
   readonly #recordings = new Recordings(this.server);
+  readonly #exports = new Exports(this.server);
   readonly #cache = new FootageCache(this.#recordings, () => this.#showFootage());
   readonly #days = new RecordedDays(this.#recordings, () => this.#showDays());
   readonly #playback = new SyncPlayback(
@@ -59,7 +61,7 @@ export class EventsScreen extends Screen {
     (footage, widthPx) => this.#recordings.stillAddress(footage, widthPx),
     (footage) => this.#open(footage),
   );
-  readonly #export = new ExportPanel(this.#recordings, (span) => this.#timeline.chooseSpan(span));
+  readonly #export = new ExportPanel(this.#exports, (span) => this.#timeline.chooseSpan(span));
   readonly #stage: Stage;
   readonly #timeline: Timeline;
   readonly #calendar: Calendar;
@@ -89,8 +91,9 @@ export class EventsScreen extends Screen {
       choose: (span) => this.#export.setSpan(span),
     });
     this.#calendar = new Calendar(this.#days, () => this.#chosenCameras(), (dayMs) => this.#pickDay(dayMs));
-    const keeping = new KeepButton(this.#recordings, session.account.is_manager, (footage) => this.#onKeepingChanged(footage));
-    this.#transport = new Transport(this.#playback, this.#recordings, this.#walk, (camera) => this.#nameOf(camera), keeping, {
+    const changed = (footage: Footage) => this.#onKeepingChanged(footage);
+    const keeping = new KeepButton(this.#recordings, this.#exports, session.account.is_manager, changed);
+    this.#transport = new Transport(this.#playback, this.#walk, (camera) => this.#nameOf(camera), keeping, {
       toggle: () => this.#togglePlaying(),
       step: (by) => this.#playback.step(by),
       skip: (by) => void this.#skip(by),

@@ -1,0 +1,62 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What is taken away as files, and what is kept from retention.
+
+import { kindParameter, type Footage, type FootageRef } from "./recordings";
+import { address, type Server } from "./server";
+
+/** What an export will be. */
+export interface ExportPlan {
+  sizeBytes: number;
+  files: number;
+  /** Of the cameras that were not recorded all the time, how much there is not. */
+  missing: { camera: string; seconds: number }[];
+}
+
+interface RawPlan {
+  size_bytes: number;
+  camera: { name: string; file: unknown[]; gap: { begin: { utc: string }; end: { utc: string } }[] }[];
+}
+
+const kApi = "VEXO.Event";
+
+export class Exports {
+  readonly #server: Server;
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  /** Rejects with status 404 where nothing of it is recorded. */
+  async plan(cameras: readonly number[], fromS: number, toS: number): Promise<ExportPlan> {
+    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
+    const { size_bytes, camera } = await this.#server.call<RawPlan>(kApi, "PlanExport", asked);
+    const missing = camera.map(({ name, gap }) => ({
+      camera: name,
+      seconds: gap.reduce((sum, { begin, end }) => sum + (Date.parse(end.utc) - Date.parse(begin.utc)) / 1000, 0),
+    }));
+    const files = camera.reduce((sum, { file }) => sum + file.length, 0);
+    return { sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
+  }
+
+  address(cameras: readonly number[], fromS: number, toS: number): string {
+    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
+    return address(kApi, "Export", { ...asked, ...zoneAt(fromS) });
+  }
+
+  /** Keeps the recordings of the footage, or gives them back to retention. For managers. */
+  async keep({ kind, id }: FootageRef, isKept: boolean, note: string): Promise<void> {
+    const form = { event: String(id), ...kindParameter(kind), keep: String(isKept), note };
+    await this.#server.call<unknown>(kApi, "Keep", {}, { form });
+  }
+}
+
+/** The file is named after its start in this browser's time zone. */
+export function downloadAddress({ kind, id, start }: Footage): string {
+  return address(kApi, "Download", { event: String(id), ...kindParameter(kind), ...zoneAt(start) });
+}
+
+/** This browser's time zone at that time, for names and times in files. */
+function zoneAt(unixS: number): Record<string, string> {
+  return { utc_offset_min: String(-new Date(unixS * 1000).getTimezoneOffset()) };
+}
