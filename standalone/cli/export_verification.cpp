@@ -8,9 +8,9 @@
 
 #include <archive.h>
 #include <archive_entry.h>
-#include <sodium.h>
 #include <unistd.h>
 
+#include "standalone/base/sha256.h"
 #include "standalone/cli/console.h"
 #include "standalone/evidence/manifest.h"
 
@@ -61,8 +61,7 @@ class Zip {
     }
 
     Member ReadMember(bool keeps_text) {
-        crypto_hash_sha256_state state;
-        crypto_hash_sha256_init(&state);
+        base::Sha256 hash;
         std::array<unsigned char, kBlockBytes> block{};
         Member member;
         while (true) {
@@ -72,15 +71,12 @@ class Zip {
                 break;
             }
             const auto size = static_cast<std::size_t>(got);
-            crypto_hash_sha256_update(&state, block.data(), size);
+            hash.Add(block.data(), size);
             if (keeps_text && member.text.size() + size <= kMaxManifestBytes) {
                 member.text.append(reinterpret_cast<const char*>(block.data()), size);
             }
         }
-        std::array<unsigned char, crypto_hash_sha256_BYTES> hash{};
-        crypto_hash_sha256_final(&state, hash.data());
-        std::array<char, evidence::kHashCharacters + 1> text{};
-        member.sha256 = sodium_bin2hex(text.data(), text.size(), hash.data(), hash.size());
+        member.sha256 = hash.Finish();
         return member;
     }
 

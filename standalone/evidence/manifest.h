@@ -15,9 +15,8 @@ namespace lookhaven::evidence {
 
 constexpr const char* kManifestName = "manifest.json";
 constexpr const char* kManifestFormat = "lookhaven export 1";
-constexpr std::size_t kHashCharacters = 64;  // SHA-256, hexadecimal
 
-// hashes: of the plan's files in their order. The text has the same length whatever they are.
+// hashes: SHA-256 of the plan's files in their order. The text has the same length whatever they are.
 std::string ManifestOf(const Plan& plan, std::span<const std::string> hashes);
 
 // What the plan says of cameras, files and gaps, without hashes.

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "standalone/base/log.h"
+#include "standalone/base/sha256.h"
 #include "standalone/evidence/manifest.h"
 #include "standalone/evidence/zip_writer.h"
 #include "standalone/media/source.h"
@@ -129,7 +130,7 @@ std::int64_t SizeOfArchive(const Plan& plan) {
             ++files;
         }
     }
-    const std::vector<std::string> no_hashes(files, std::string(kHashCharacters, '0'));
+    const std::vector<std::string> no_hashes(files, std::string(base::kSha256Digits, '0'));
     zip.Skip(kManifestName, std::ssize(ManifestOf(plan, no_hashes)));
     zip.End();
     return zip.Position();
