@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/evidence/manifest.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <cstdlib>
@@ -8,6 +9,7 @@
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/sha256.h"
 
 namespace lookhaven::evidence {
 
@@ -32,9 +34,44 @@ Json::Value Describe(const Plan& plan, const File& file) {
     return json;
 }
 
+Json::Value SpansJson(const Plan& plan, const std::vector<archive::TimeSpan>& spans) {
+    Json::Value json(Json::arrayValue);
+    for (const archive::TimeSpan& span : spans) {
+        Json::Value each;
+        each["begin"] = MomentOf(plan, span.begin_ms);
+        each["end"] = MomentOf(plan, span.end_ms);
+        json.append(each);
+    }
+    return json;
+}
+
 std::string HostName() {
     std::array<char, 256> name{};
     return ::gethostname(name.data(), name.size() - 1) == 0 ? name.data() : "";
+}
+
+// Without what fills it up.
+std::string TextOf(const Plan& plan, std::span<const WrittenFile> written) {
+    Json::Value json;
+    json["format"] = kManifestFormat;
+    json["exported"] = MomentOf(plan, plan.request.now_ms);
+    json["exported"]["by"] = plan.request.exporter;
+    json["exported"]["host"] = HostName();
+    json["begin"] = MomentOf(plan, plan.request.span.begin_ms);
+    json["end"] = MomentOf(plan, plan.request.span.end_ms);
+    json["camera"] = CamerasOf(plan);
+    auto next = written.begin();
+    for (Json::Value& camera : json["camera"]) {
+        for (Json::Value& file : camera["file"]) {
+            file["sha256"] = next->sha256;
+            file["missing"] = SpansJson(plan, next->missing);
+            ++next;
+        }
+    }
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "  ";
+    builder["emitUTF8"] = true;
+    return Json::writeString(builder, json) + '\n';
 }
 
 }  // namespace
@@ -49,37 +86,29 @@ Json::Value CamerasOf(const Plan& plan) {
         for (const File& file : camera.files) {
             json["file"].append(Describe(plan, file));
         }
-        json["gap"] = Json::arrayValue;
-        for (const archive::TimeSpan& gap : camera.gaps) {
-            Json::Value each;
-            each["begin"] = MomentOf(plan, gap.begin_ms);
-            each["end"] = MomentOf(plan, gap.end_ms);
-            json["gap"].append(each);
-        }
+        json["gap"] = SpansJson(plan, camera.gaps);
         cameras.append(json);
     }
     return cameras;
 }
 
-std::string ManifestOf(const Plan& plan, std::span<const std::string> hashes) {
-    Json::Value json;
-    json["format"] = kManifestFormat;
-    json["exported"] = MomentOf(plan, plan.request.now_ms);
-    json["exported"]["by"] = plan.request.exporter;
-    json["exported"]["host"] = HostName();
-    json["begin"] = MomentOf(plan, plan.request.span.begin_ms);
-    json["end"] = MomentOf(plan, plan.request.span.end_ms);
-    json["camera"] = CamerasOf(plan);
-    std::size_t next = 0;
-    for (Json::Value& camera : json["camera"]) {
-        for (Json::Value& file : camera["file"]) {
-            file["sha256"] = hashes[next++];
+// Spaces and a line break at the end are where what is missing would be.
+std::string ManifestOf(const Plan& plan, std::span<const WrittenFile> written) {
+    std::string text = TextOf(plan, written);
+    text.resize(static_cast<std::size_t>(ManifestBytes(plan)) - 1, ' ');
+    return text + '\n';
+}
+
+std::int64_t ManifestBytes(const Plan& plan) {
+    std::vector<WrittenFile> longest;
+    for (const Camera& camera : plan.cameras) {
+        for (const File& file : camera.files) {
+            const auto spans = static_cast<std::size_t>(std::min(kMaxMissingSpans, std::ssize(file.parts)));
+            longest.push_back(
+                {std::string(base::kSha256Digits, '0'), std::vector<archive::TimeSpan>(spans, plan.request.span)});
         }
     }
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "  ";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, json) + '\n';
+    return std::ssize(TextOf(plan, longest)) + 1;
 }
 
 std::string LocalTime(std::int64_t wall_ms, int utc_offset_min) {

@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The list that an export carries: cameras, times, gaps and the hash of each file.
+// The manifest of an export: cameras, times, gaps and the hash of each file.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <span>
 #include <string>
+#include <vector>
 
 #include <json/json.h>
 
@@ -16,8 +18,18 @@ namespace lookhaven::evidence {
 constexpr const char* kManifestName = "manifest.json";
 constexpr const char* kManifestFormat = "lookhaven export 1";
 
-// hashes: SHA-256 of the plan's files in their order. The text has the same length whatever they are.
-std::string ManifestOf(const Plan& plan, std::span<const std::string> hashes);
+// More of them in one file are told as fewer and longer ones.
+constexpr std::ptrdiff_t kMaxMissingSpans = 4;
+
+struct WrittenFile {
+    std::string sha256 = {};
+    // What the plan promised and could no longer be read: at most kMaxMissingSpans, and no more than the file has parts.
+    std::vector<archive::TimeSpan> missing = {};
+};
+
+// written: the plan's files in their order. The text has ManifestBytes whatever became of them.
+std::string ManifestOf(const Plan& plan, std::span<const WrittenFile> written);
+std::int64_t ManifestBytes(const Plan& plan);
 
 // What the plan says of cameras, files and gaps, without hashes.
 Json::Value CamerasOf(const Plan& plan);

@@ -4,10 +4,10 @@
 #include <algorithm>
 #include <numeric>
 #include <set>
+#include <stdexcept>
 #include <utility>
 
 #include "standalone/base/log.h"
-#include "standalone/base/sha256.h"
 #include "standalone/evidence/manifest.h"
 #include "standalone/evidence/zip_writer.h"
 #include "standalone/media/source.h"
@@ -39,24 +39,6 @@ std::string FileName(std::string name) {
     return name;
 }
 
-std::vector<RecordingPart> PartsOf(const CameraFootage& camera, const TimeSpan& span) {
-    std::vector<RecordingPart> parts;
-    for (const std::filesystem::path& recording : camera.recordings) {
-        try {
-            if (!std::filesystem::exists(recording)) {
-                continue;  // deleted meanwhile
-            }
-            if (auto part = archive::PartOf(recording, span.begin_ms, span.end_ms)) {
-                parts.push_back(*std::move(part));
-            }
-        } catch (const archive::ArchiveError& error) {
-            base::LogWarning("left out of an export: " + std::string(error.what()));
-        }
-    }
-    std::ranges::stable_sort(parts, {}, &RecordingPart::FirstWallMs);
-    return parts;
-}
-
 // What must be the same for recordings to be joined.
 std::string FormatOf(const CameraFootage& camera, const RecordingPart& part, const media::RemuxLibrary& remux) {
     const archive::IndexHeader& header = part.header;
@@ -65,12 +47,37 @@ std::string FormatOf(const CameraFootage& camera, const RecordingPart& part, con
            (has_sound ? remux.SoundOf(part.path) : "");
 }
 
-std::vector<File> FilesOf(const CameraFootage& camera, std::vector<RecordingPart> parts,
-                          const media::RemuxLibrary& remux) {
+struct Part {
+    RecordingPart recorded;
+    std::string format;
+
+    std::int64_t FirstWallMs() const { return recorded.FirstWallMs(); }
+};
+
+std::vector<Part> PartsOf(const CameraFootage& camera, const TimeSpan& span, const media::RemuxLibrary& remux) {
+    std::vector<Part> parts;
+    for (const std::filesystem::path& recording : camera.recordings) {
+        // Of archive::ArchiveError, media::SourceError and std::system_error, each says which recording it is.
+        try {
+            if (!std::filesystem::exists(recording)) {
+                continue;  // deleted meanwhile
+            }
+            if (auto part = archive::PartOf(recording, span.begin_ms, span.end_ms)) {
+                std::string format = FormatOf(camera, *part, remux);
+                parts.push_back({*std::move(part), std::move(format)});
+            }
+        } catch (const std::runtime_error& error) {
+            base::LogWarning("left out of an export: " + std::string(error.what()));
+        }
+    }
+    std::ranges::stable_sort(parts, {}, &Part::FirstWallMs);
+    return parts;
+}
+
+std::vector<File> FilesOf(const CameraFootage& camera, std::vector<Part> parts) {
     std::vector<File> files;
     std::string format;
-    for (RecordingPart& part : parts) {
-        const std::string next = FormatOf(camera, part, remux);
+    for (auto& [part, next] : parts) {
         const bool is_apart =
             !files.empty() && part.FirstWallMs() - files.back().parts.back().LastWallMs() > kMaxStillMs;
         if (files.empty() || next != format || is_apart) {
@@ -84,7 +91,7 @@ std::vector<File> FilesOf(const CameraFootage& camera, std::vector<RecordingPart
     return files;
 }
 
-std::vector<TimeSpan> GapsOf(const std::vector<RecordingPart>& parts, TimeSpan span) {
+std::vector<TimeSpan> GapsOf(const std::vector<Part>& parts, TimeSpan span) {
     std::vector<TimeSpan> gaps;
     const auto add = [&](std::int64_t begin_ms, std::int64_t end_ms) {
         begin_ms = std::max(begin_ms, span.begin_ms);
@@ -94,7 +101,7 @@ std::vector<TimeSpan> GapsOf(const std::vector<RecordingPart>& parts, TimeSpan s
         }
     };
     std::int64_t reached_ms = span.begin_ms;
-    for (const RecordingPart& part : parts) {
+    for (const auto& [part, format] : parts) {
         add(reached_ms, part.FirstWallMs());
         for (const TimeSpan& gap : part.gaps) {
             add(gap.begin_ms, gap.end_ms);
@@ -123,15 +130,12 @@ void NameFiles(Plan& plan) {
 // As Write sends it, without the files' bytes.
 std::int64_t SizeOfArchive(const Plan& plan) {
     ZipWriter zip([](auto) { return true; });
-    std::size_t files = 0;
     for (const Camera& camera : plan.cameras) {
         for (const File& file : camera.files) {
             zip.Skip(file.name, file.size_bytes);
-            ++files;
         }
     }
-    const std::vector<std::string> no_hashes(files, std::string(base::kSha256Digits, '0'));
-    zip.Skip(kManifestName, std::ssize(ManifestOf(plan, no_hashes)));
+    zip.Skip(kManifestName, ManifestBytes(plan));
     zip.End();
     return zip.Position();
 }
@@ -155,9 +159,9 @@ Plan MakePlan(Request request, const media::RemuxLibrary& remux) {
     Plan plan{.request = std::move(request)};
     const TimeSpan span{plan.request.span.begin_ms, std::min(plan.request.span.end_ms, plan.request.now_ms)};
     for (const CameraFootage& footage : plan.request.cameras) {
-        std::vector<RecordingPart> parts = PartsOf(footage, span);
+        std::vector<Part> parts = PartsOf(footage, span, remux);
         Camera camera{.id = footage.id, .name = footage.name, .files = {}, .gaps = GapsOf(parts, span)};
-        camera.files = FilesOf(footage, std::move(parts), remux);
+        camera.files = FilesOf(footage, std::move(parts));
         plan.cameras.push_back(std::move(camera));
     }
     NameFiles(plan);

@@ -61,8 +61,8 @@ struct Plan {
     std::int64_t size_bytes = 0;
 };
 
-// A recording that is damaged is left out, which shows as a gap. The plan has no camera with a file when nothing was
-// recorded. Throws media::SourceError, std::system_error.
+// A recording that is damaged, gone or cannot be read is left out, which shows as a gap and in the log. The plan has no
+// camera with a file when nothing was recorded.
 Plan MakePlan(Request request, const media::RemuxLibrary& remux);
 
 }  // namespace lookhaven::evidence

@@ -28,6 +28,10 @@ struct JoinOptions {
     Container container = Container::kMatroska;
     bool with_sound = true;
     std::int64_t size_bytes = 0;  // of the whole file: the sum of MaxJoinedBytes
+    // A part that cannot be opened, or not read to its end, is left out from there on: called with why and with the
+    // moment, by the wall clock, from which on it is missing. What it throws ends the join. Empty: SourceError instead.
+    std::function<void(const archive::RecordingPart& part, std::int64_t from_wall_ms, const std::string& reason)>
+        on_unreadable = {};
 };
 
 // What the recording's sound is made of, to be compared: recordings with another cannot be joined. Empty without sound.
@@ -35,8 +39,8 @@ struct JoinOptions {
 std::string SoundOf(const std::filesystem::path& recording);
 
 // The parts have one format and are in the order of time. A time without recordings stays in the file as one in which
-// the picture stands still. Keeps at most a second of footage in memory. Throws SourceError, archive::ArchiveError;
-// std::system_error with the sink's errno.
-void Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options, const ByteSink& sink);
+// the picture stands still. Keeps at most a second of footage in memory. False when none of the parts could be read:
+// then nothing was sent. Throws SourceError; std::system_error with the sink's errno.
+bool Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options, const ByteSink& sink);
 
 }  // namespace lookhaven::media

@@ -2,6 +2,7 @@
 #include "standalone/media/joiner.h"
 
 #include <algorithm>
+#include <stdexcept>
 #include <string>
 #include <utility>
 
@@ -68,11 +69,15 @@ Joiner::Joiner(ContainerOutput& output, Container container, bool with_sound, st
       flushed_(std::move(flushed)) {}
 
 void Joiner::Add(const archive::RecordingPart& part) {
-    Open(part);
-    if (container_ == Container::kMp4) {
-        PlanDecoding(part);
-    }
     const std::int64_t wall_ms = part.FirstWallMs();
+    try {
+        Open(part);
+        if (container_ == Container::kMp4) {
+            PlanDecoding(part);
+        }
+    } catch (const std::runtime_error& error) {  // SourceError, archive::ArchiveError, std::system_error
+        throw UnreadablePart(error.what(), wall_ms);
+    }
     if (!begun_) {
         Begin(wall_ms);
     }
@@ -117,11 +122,10 @@ void Joiner::Copy(const archive::RecordingPart& part) {
         const AVRational unit = input_->streams[video_]->time_base;
         av_seek_frame(input_.get(), video_, av_rescale_q(part.begin_ms, {1, 1000}, unit), AVSEEK_FLAG_BACKWARD);
     }
+    std::int64_t reached_ms = part.begin_ms;
     // Frames are counted: one that is shown earlier may follow the last one.
     for (std::int64_t copied = 0; copied < part.frames;) {
-        av_packet_unref(packet_.get());
-        // A growing recording may end inside a frame, but only after the last frame in its index.
-        CheckAv(av_read_frame(input_.get(), packet_.get()), "cannot read on in " + part.path.string());
+        ReadPacket(part, reached_ms);
         const bool is_video = packet_->stream_index == video_;
         if ((!is_video && (packet_->stream_index != audio_ || to_audio_ < 0)) || packet_->pts == AV_NOPTS_VALUE) {
             continue;
@@ -131,7 +135,18 @@ void Joiner::Copy(const archive::RecordingPart& part) {
         if (time_ms >= part.begin_ms && time_ms <= part.last_ms) {
             Write(is_video, time_ms);
             copied += is_video ? 1 : 0;
+            reached_ms = is_video ? std::max(reached_ms, time_ms) : reached_ms;
         }
+    }
+}
+
+void Joiner::ReadPacket(const archive::RecordingPart& part, std::int64_t reached_ms) {
+    av_packet_unref(packet_.get());
+    try {
+        // A growing recording may end inside a frame, but only after the last frame in its index.
+        CheckAv(av_read_frame(input_.get(), packet_.get()), "cannot read on in " + part.path.string());
+    } catch (const SourceError& error) {
+        throw UnreadablePart(error.what(), part.header.start_wall_ms + reached_ms);
     }
 }
 

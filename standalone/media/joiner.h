@@ -10,23 +10,41 @@
 #include "standalone/archive/recording_part.h"
 #include "standalone/base/file_descriptor.h"
 #include "standalone/media/container_output.h"
+#include "standalone/media/source.h"
 
 namespace lookhaven::media {
+
+// Why a part cannot be opened, or not read to its end.
+class UnreadablePart : public SourceError {
+  public:
+    UnreadablePart(const std::string& sentence, std::int64_t from_wall_ms)
+        : SourceError(sentence),
+          from_wall_ms_(from_wall_ms) {}
+    // The part is in the output up to there.
+    std::int64_t FromWallMs() const { return from_wall_ms_; }
+
+  private:
+    std::int64_t from_wall_ms_;
+};
 
 class Joiner {
   public:
     // Borrows the output, which it begins with the first part. flushed: called after each second of footage.
     Joiner(ContainerOutput& output, Container container, bool with_sound, std::function<void()> flushed = {});
 
-    // Throw SourceError, archive::ArchiveError, std::system_error. Call Finish behind the last part.
+    // Throw UnreadablePart, after which the next part can be added; SourceError and std::system_error of the output.
+    // Call Finish behind the last part.
     void Add(const archive::RecordingPart& part);
     void Finish();
+    // Whether there was a part that could be opened.
+    bool HasBegun() const { return begun_; }
 
   private:
     void Open(const archive::RecordingPart& part);
     void Begin(std::int64_t wall_ms);
     void PlanDecoding(const archive::RecordingPart& part);
     void Copy(const archive::RecordingPart& part);
+    void ReadPacket(const archive::RecordingPart& part, std::int64_t reached_ms);
     // MP4 stores durations, so a packet is written when its stream's next one is known.
     struct Pending {
         AvPtr<AVPacket> packet = OwnAv(av_packet_alloc());

@@ -64,7 +64,7 @@ class RemuxLibrary {
     // As Export in remux.h.
     virtual void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const = 0;
     // As Join and SoundOf in join.h.
-    virtual void Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options,
+    virtual bool Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options,
                       const ByteSink& sink) const = 0;
     virtual std::string SoundOf(const std::filesystem::path& recording) const = 0;
 };

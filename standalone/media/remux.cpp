@@ -145,14 +145,25 @@ class SizedStream {
 
 }  // namespace
 
-void Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options, const ByteSink& sink) {
+bool Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options, const ByteSink& sink) {
     SizedStream stream(sink, options.container, options.size_bytes);
     Joiner joiner(stream.Output(), options.container, options.with_sound, [&] { stream.CheckSize(); });
     for (const archive::RecordingPart& part : parts) {
-        joiner.Add(part);
+        try {
+            joiner.Add(part);
+        } catch (const UnreadablePart& error) {
+            if (!options.on_unreadable) {
+                throw;
+            }
+            options.on_unreadable(part, error.FromWallMs(), error.what());
+        }
+    }
+    if (!joiner.HasBegun()) {
+        return false;
     }
     joiner.Finish();
     stream.End();
+    return true;
 }
 
 void Export(const std::filesystem::path& recording, int output, const ExportOptions& options) {

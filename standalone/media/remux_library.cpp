@@ -11,9 +11,9 @@ class Library : public RemuxLibrary {
     void Copy(const std::filesystem::path& recording, int output, const ExportOptions& options) const override {
         Export(recording, output, options);
     }
-    void Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options,
+    bool Join(std::span<const archive::RecordingPart> parts, const JoinOptions& options,
               const ByteSink& sink) const override {
-        media::Join(parts, options, sink);
+        return media::Join(parts, options, sink);
     }
     std::string SoundOf(const std::filesystem::path& recording) const override { return media::SoundOf(recording); }
 };

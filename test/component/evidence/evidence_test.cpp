@@ -12,6 +12,7 @@
 #include "standalone/evidence/manifest.h"
 #include "standalone/evidence/write.h"
 #include "standalone/evidence/zip_writer.h"
+#include "standalone/media/source.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 
@@ -94,7 +95,7 @@ TEST_F(Evidence, OneCameraBecomesOneFileInWhichItsRecordingsFollowEachOther) {
     }
 }
 
-TEST_F(Evidence, SeveralBecomeAnArchiveWhoseListIsTrue) {
+TEST_F(Evidence, SeveralBecomeAnArchiveWhoseManifestIsTrue) {
     const auto silent = Footage("081530-1.mkv", 0, kH264);
     const auto loud = Footage("081534-2.mkv", 4000, kH264, "-c:a aac -ar 16000");
     const auto other = Footage("081530-3.mkv", 0, kMjpeg);
@@ -127,6 +128,47 @@ TEST_F(Evidence, SeveralBecomeAnArchiveWhoseListIsTrue) {
     EXPECT_THAT(probed, MatchesRegex("h264,100\n h264,100\naac,[0-9]+\nAAC mjpeg,100\n mjpeg,100\n "));
 }
 
+TEST_F(Evidence, WhatCannotBeReadIsLeftOutAndTold) {
+    const auto first = Footage("081530-1.mkv", 0, kH264, "-c:a aac -ar 16000");
+    const auto second = Footage("081534-2.mkv", 4000, kH264, "-c:a aac -ar 16000");
+    const auto other = Footage("081530-3.mkv", 0, kMjpeg);
+    const auto no_file = folder_ / "2026-03-01/081538-4.mkv";
+    std::filesystem::create_directory(no_file);
+    Request request = Ask({{1, "Yard", true, {first, second, no_file}}, {2, "Gate", true, {other}}}, 0, 8000);
+    const std::string whole = Contents(second);
+    Write(second, std::string(whole.size(), 'x'));  // its index is as it was
+    Export(request);
+    ASSERT_EQ(plan_.cameras[0].files.size(), 1U);
+    EXPECT_EQ(plan_.cameras[0].gaps.back(), (archive::TimeSpan{kStartMs + 3960, kStartMs + 8000}));
+    Write(second, whole);
+    // What is lost once the plan is made: half of one recording, and all of another.
+    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    const Plan plan = MakePlan(request, remux);
+    Write(second, whole.substr(0, whole.size() / 4) + std::string(whole.size() - whole.size() / 4, '\0'));
+    std::filesystem::remove(other);
+    const std::filesystem::path out = folder_ / "lossy.zip";
+    const base::FileDescriptor file = base::OpenFile(out, O_WRONLY | O_CREAT);
+    evidence::Write(plan, remux, [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); });
+    EXPECT_EQ(static_cast<std::int64_t>(std::filesystem::file_size(out)), plan.size_bytes);
+    EXPECT_EQ(Shell("cd " + Quoted(folder_.Path()) +
+                    " && python3 -c \"import zipfile, sys;"
+                    " z = zipfile.ZipFile(sys.argv[1]); print(z.testzip()); z.extractall()\" " +
+                    Quoted(out)),
+              "None\n");
+    Json::Value manifest;
+    std::istringstream(Contents(folder_ / kManifestName)) >> manifest;
+    const Json::Value& cut = manifest["camera"][0]["file"][0];
+    EXPECT_THAT(Probe(Quoted(folder_ / cut["name"].asString())), MatchesRegex("(.|\n)*h264,1[0-4][0-9]\naac,[0-9]+\n"));
+    EXPECT_THAT(cut["missing"][0]["begin"]["utc"].asString(), MatchesRegex("2026-03-01T08:15:3[45].*"));
+    EXPECT_EQ(cut["missing"][0]["end"], cut["last_frame"]);
+    const Json::Value& lost = manifest["camera"][1]["file"][0];
+    EXPECT_EQ(lost["missing"][0]["begin"], lost["first_frame"]);
+    EXPECT_EQ(Shell("sha256sum <" + Quoted(folder_ / lost["name"].asString())), lost["sha256"].asString() + "  -\n");
+    request.cameras.pop_back();
+    EXPECT_THROW(evidence::Write(MakePlan(request, remux), remux, [](auto) { return true; }), media::SourceError)
+        << "one file has no manifest to tell it in";
+}
+
 TEST_F(Evidence, WhatIsCutOrCannotBeTakenThrows) {
     const auto first = Footage("081530-1.mkv", 0, kH264);
     const auto second = Footage("081534-2.mkv", 4000, kH264);
@@ -136,7 +178,7 @@ TEST_F(Evidence, WhatIsCutOrCannotBeTakenThrows) {
     EXPECT_THROW(evidence::Write(plan, remux, [&](auto) { return errno = EPIPE, false; }), std::system_error);
     std::filesystem::remove(second);
     EXPECT_THROW(evidence::Write(plan, remux, [&](auto bytes) { return taken += std::ssize(bytes), true; }),
-                 std::system_error);
+                 media::SourceError);
     EXPECT_LT(taken, plan.size_bytes);
     Write(first, "damaged");
     EXPECT_TRUE(MakePlan(Ask({{1, "Yard", true, {first, second}}}, 0, 8000), remux).cameras[0].files.empty());
