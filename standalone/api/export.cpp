@@ -32,6 +32,9 @@ namespace {
 
 constexpr std::size_t kMaxCameras = 16;
 constexpr std::int64_t kMaxSpanSeconds = 86'400;
+constexpr std::size_t kMaxRecordings = 20'000;
+constexpr std::size_t kMaxExportsOfUser = 2;
+constexpr std::size_t kMaxExports = 6;
 constexpr std::int64_t kMaxBytes = std::int64_t{256} << 30;
 
 std::set<int> CamerasOf(const Call& call) {
@@ -52,16 +55,23 @@ archive::TimeSpan SpanOf(const Call& call, std::int64_t now_s) {
     return {from_s * 1000, to_s * 1000};
 }
 
-// The camera's recordings; asks the recorder for the latest of one that grows.
+// The camera's recordings; asks the recorder for the latest of one that grows. left: how many more there may be.
 evidence::CameraFootage FootageOf(const Call& call, int id, const archive::TimeSpan& span,
-                                  const std::map<int, std::string>& mounts) {
+                                  const std::map<int, std::string>& mounts, std::size_t& left) {
     const auto camera = store::Cameras(call.Records()).Find(id);
-    const std::vector<store::Event> events =
-        store::Events(call.Records())
-            .List({.camera_ids = {id}, .begin_s = span.begin_ms / 1000, .end_s = span.end_ms / 1000});
+    const std::vector<store::Event> events = store::Events(call.Records())
+                                                 .List({.camera_ids = {id},
+                                                        .begin_s = span.begin_ms / 1000,
+                                                        .end_s = span.end_ms / 1000,
+                                                        .limit = static_cast<int>(left) + 1});
     if (!binding::MayUse(id, store::CameraAccess::kPlayback) || (!camera && events.empty())) {
         throw Failure(404, kNoSuchCamera);
     }
+    if (events.size() > left) {
+        throw Failure(400, "these are more than " + std::to_string(kMaxRecordings) +
+                               " recordings: choose a shorter span or fewer cameras");
+    }
+    left -= events.size();
     evidence::CameraFootage footage{.id = id, .name = camera ? camera->name : "Camera " + std::to_string(id)};
     footage.with_sound = binding::MayUse(id, store::CameraAccess::kAudio);
     for (const store::Event& event : events) {
@@ -90,10 +100,25 @@ evidence::Request RequestOf(const Call& call) {
     for (const store::Mount& mount : store::Mounts(call.Records()).List()) {
         mounts.emplace(mount.id, mount.path);
     }
+    std::size_t left = kMaxRecordings;
     for (const int id : ids) {
-        request.cameras.push_back(FootageOf(call, id, request.span, mounts));
+        request.cameras.push_back(FootageOf(call, id, request.span, mounts, left));
     }
     return request;
+}
+
+void OccupyExport(const Call& call) {
+    switch (call.slots.BeginExport(call.slot, kMaxExportsOfUser, kMaxExports)) {
+    case control::Admission::kGranted:
+        return;
+    case control::Admission::kTooManyOfUser:
+        throw Failure(429,
+                      "this account is exporting " + std::to_string(kMaxExportsOfUser) +
+                          " files already: wait until one is complete",
+                      http::kRetrySoonSeconds);
+    case control::Admission::kTooMany:
+        throw Failure(503, "too many exports are running; try again in a moment", http::kRetrySoonSeconds);
+    }
 }
 
 // Confines the process: what reads on from here has been sent by a camera.
@@ -125,9 +150,10 @@ std::string PlanExport(const Call& call) {
 }
 
 std::string Export(const Call& call) {
-    call.context.NoteStream();
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    OccupyExport(call);
     const evidence::Plan plan = PlanOf(call, remux);
+    call.context.NoteStream();  // the plan has the limits of a search
     SendAttachmentHead(plan.content_type, plan.name, plan.size_bytes);
     try {
         evidence::Write(plan, remux,

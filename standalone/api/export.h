@@ -11,7 +11,8 @@ namespace lookhaven::api {
 
 // The methods PlanExport and Export of VEXO.Event: what the file would hold, and the file itself, which goes to
 // standard output. Without sound where the caller may not hear a camera. Throw Failure 400; 404 for a camera that is
-// not there or that the caller may not play back, and where nothing was recorded; 500 when footage cannot be read.
+// not there or that the caller may not play back, and where nothing was recorded; 429 and 503 while as many exports of
+// the account, or in all, are running as may; 500 when footage cannot be read.
 std::string PlanExport(const Call& call);
 std::string Export(const Call& call);
 

@@ -148,7 +148,7 @@ Admission SlotTable::Admit(Slot& slot, int user, std::size_t max_of_user, std::s
 bool SlotTable::BeginSearch(Slot& slot, std::size_t max_of_user) {
     const SharedLock lock = TryLock(guard_->mutex);
     const auto counts = [user = slot.user.load()](const Slot& each) {
-        return each.work == Work::kSearch && each.user == user && !each.is_stream;
+        return (each.work == Work::kSearch || each.work == Work::kExport) && each.user == user && !each.is_stream;
     };
     if (!lock || CountOthers(slot, counts) >= max_of_user) {
         return false;
@@ -163,6 +163,20 @@ bool SlotTable::BeginHashing(Slot& slot, std::size_t max_in_all) {
 
 bool SlotTable::BeginProbing(Slot& slot, std::size_t max_in_all) {
     return BeginWork(slot, Work::kProbing, max_in_all);
+}
+
+Admission SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    const auto exports = [](const Slot& each) { return each.work == Work::kExport; };
+    const auto of_user = [&](const Slot& each) { return exports(each) && each.user == slot.user; };
+    if (lock && CountOthers(slot, of_user) >= max_of_user) {
+        return Admission::kTooManyOfUser;
+    }
+    if (!lock || CountOthers(slot, exports) >= max_in_all) {
+        return Admission::kTooMany;
+    }
+    slot.work = Work::kExport;
+    return Admission::kGranted;
 }
 
 bool SlotTable::BeginWork(Slot& slot, Work work, std::size_t max_in_all) {

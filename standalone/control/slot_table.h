@@ -61,6 +61,7 @@ enum class Work : std::uint8_t {
     kSearch,   // may take seconds of a processor
     kHashing,  // of a password, in 64 MiB
     kProbing,  // of a camera, by a process of its own
+    kExport,   // of footage; a search, too, until its answer turns out to be a stream
 };
 
 enum class Admission { kGranted, kTooManyOfUser, kTooMany };
@@ -114,7 +115,7 @@ class SlotTable {
     // Of the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
-    // For a request process, four ways to occupy something, each in one step among all processes: however many try at
+    // For a request process, five ways to occupy something, each in one step among all processes: however many try at
     // once, no more than the limit succeed.
     //
     // The request is the user's from here on. Counted are admitted requests.
@@ -125,6 +126,8 @@ class SlotTable {
     bool BeginHashing(Slot& slot, std::size_t max_in_all);
     // Until the process ends. False: no room.
     bool BeginProbing(Slot& slot, std::size_t max_in_all);
+    // Of its user's exports, until the process ends. kGranted, or for lack of room nothing is changed.
+    Admission BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
     static void EndWork(Slot& slot) { slot.work = Work::kNone; }
 
     // The sessions of running requests, unless they must end anyway.

@@ -90,6 +90,8 @@ TEST_F(EventApi, RefusesBadInput) {
     const std::int64_t now_s = base::WallSeconds();
     const std::string late = std::to_string(now_s + 600);
     const std::string early = std::to_string(now_s - 600);
+    const store::Event small{.camera_id = 3, .mount_id = 9, .start_s = 3'000'000, .end_s = 3'000'001};
+    store::Events(footage_.Records()).AddAll(std::vector(20'001, small));
     std::string many;
     for (int id = 1; id <= 1001; ++id) {
         many += std::to_string(id) + ",";
@@ -151,6 +153,7 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Export&from=1000000&to=1000010&cameralists=1", "", 404},
         {"Event&version=1&method=Export&from=1000000&to=1000010&cameralists=1,99", "", 404},
         {"Event&version=1&method=PlanExport&from=1000000&to=1000010&cameralists=2", "", 404, true},
+        {"Event&version=1&method=PlanExport&from=2999990&to=3000010&cameralists=3", "", 400},
         {"Event&version=1&method=Get&event=99", "", 404},
         {"Event&version=1&method=Get&event=x", "", 400},
         {"Event&version=2&method=List", "", 404},

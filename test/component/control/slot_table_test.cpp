@@ -59,6 +59,26 @@ TEST(SlotTable, IsNotOvershotByABurst) {
     EXPECT_TRUE(hash(*next));
 }
 
+TEST(SlotTable, ExportsAreFewAndSearchesUntilTheyAreSent) {
+    SlotTable table(5);
+    std::vector<Slot*> slots;
+    for (const int user : {1, 1, 1, 2, 3}) {
+        slots.push_back(table.Take());
+        slots.back()->user = user;
+    }
+    const Admission expected[] = {Admission::kGranted, Admission::kGranted, Admission::kTooManyOfUser,
+                                  Admission::kGranted, Admission::kTooMany};
+    for (std::size_t i = 0; i < slots.size(); ++i) {
+        EXPECT_EQ(table.BeginExport(*slots[i], 2, 3), expected[i]) << i;
+    }
+    EXPECT_FALSE(table.BeginSearch(*slots[2], 2));
+    slots[0]->is_stream = true;
+    EXPECT_TRUE(table.BeginSearch(*slots[2], 2));
+    EXPECT_EQ(table.BeginExport(*slots[2], 2, 9), Admission::kTooManyOfUser);
+    table.Free(*slots[1]);
+    EXPECT_EQ(table.BeginExport(*slots[2], 2, 3), Admission::kGranted);
+}
+
 TEST(SlotTable, SurvivesAProcessKilledInTheMidstOfIt) {
     SlotTable table(2);
     Slot& slot = *table.Take();
