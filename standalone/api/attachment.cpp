@@ -5,6 +5,8 @@
 #include <cctype>
 #include <cstdio>
 
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
 #include "standalone/base/text.h"
 
 namespace lookhaven::api {
@@ -30,6 +32,13 @@ int UtcOffset(const Call& call) {
         throw Failure(400, "utc_offset_min is out of its bounds");
     }
     return static_cast<int>(offset_min);
+}
+
+void LogTakenAway(const Call& call, const std::string& what, const std::string& cameras,
+                  const archive::TimeSpan& span) {
+    const admin::Actor caller = call.Actor();
+    base::LogInfo(Json::valueToQuotedString(caller.name.c_str()) + " from " + caller.address + " is sent " + what +
+                  " of " + cameras + ", " + base::FormatUtc(span.begin_ms) + " to " + base::FormatUtc(span.end_ms));
 }
 
 void SendAttachmentHead(const std::string& content_type, const std::string& name, std::int64_t size_bytes) {

@@ -7,11 +7,15 @@
 #include <string>
 
 #include "standalone/api/call.h"
+#include "standalone/archive/recording_part.h"
 
 namespace lookhaven::api {
 
 // The client's zone in minutes east of UTC; 0 when the parameter "utc_offset_min" is missing. Throws Failure 400.
 int UtcOffset(const Call& call);
+
+// Says in the log that the caller, who has a login, is sent footage: "an export", of "camera 1, 2".
+void LogTakenAway(const Call& call, const std::string& what, const std::string& cameras, const archive::TimeSpan& span);
 
 // Writes the head of an answer of that size to standard output. name: the file's, in UTF-8.
 void SendAttachmentHead(const std::string& content_type, const std::string& name, std::int64_t size_bytes);

@@ -10,7 +10,6 @@
 #include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/footage.h"
 #include "standalone/base/clock.h"
-#include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/store/cameras.h"
@@ -39,6 +38,8 @@ std::string Download(const Call& call) {
     options.announce = [&name](std::int64_t size_bytes) { SendAttachmentHead("video/x-matroska", name, size_bytes); };
     call.context.NoteStream();
     OpenFootage(call, footage, 0);  // while an error answer is still possible
+    LogTakenAway(call, "a download", "camera " + std::to_string(footage.camera_id),
+                 {footage.start_s * 1000, footage.end_s * 1000});
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     call.slots.KeepOnly(call.slot);
     const base::Installation& installation = call.context.Installation();

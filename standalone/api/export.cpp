@@ -121,6 +121,14 @@ void OccupyExport(const Call& call) {
     }
 }
 
+void LogExport(const Call& call, const evidence::Request& request) {
+    std::string cameras;
+    for (const evidence::CameraFootage& camera : request.cameras) {
+        cameras += (cameras.empty() ? "camera " : ", ") + std::to_string(camera.id);
+    }
+    LogTakenAway(call, "an export", cameras, request.span);
+}
+
 // Confines the process: what reads on from here has been sent by a camera.
 evidence::Plan PlanOf(const Call& call, const media::RemuxLibrary& remux) {
     evidence::Request request = RequestOf(call);
@@ -153,6 +161,7 @@ std::string Export(const Call& call) {
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     OccupyExport(call);
     const evidence::Plan plan = PlanOf(call, remux);
+    LogExport(call, plan.request);
     call.context.NoteStream();  // the plan has the limits of a search
     SendAttachmentHead(plan.content_type, plan.name, plan.size_bytes);
     try {
