@@ -148,9 +148,7 @@ std::string List(const Call& call) {
     if (!kept.isNull() && kept.asBool()) {
         auto filter = FilterOf<store::EventFilter>(call);
         filter.kept_only = true;
-        for (const store::Event& event : store::Events(call.Records()).List(filter)) {
-            data["event"].append(DescribeWithKeeping(call.Records(), event));
-        }
+        data["event"] = DescribeWithKeeping(call.Records(), store::Events(call.Records()).List(filter));
         return SuccessAnswer(data);
     }
     auto filter = FilterOf<store::MarkFilter>(call);

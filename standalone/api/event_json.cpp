@@ -2,6 +2,7 @@
 #include "standalone/api/event_json.h"
 
 #include <algorithm>
+#include <map>
 
 #include "standalone/store/kept_events.h"
 
@@ -17,6 +18,12 @@ Json::Value LinesOf(const std::string& text) {
         at = end + 1;
     }
     return lines;
+}
+
+void AddKeeping(Json::Value& json, const store::Keeping& keeping) {
+    json["note"] = keeping.note;
+    json["kept_by"] = keeping.keeper;
+    json["kept"] = Json::Int64{keeping.kept_s};
 }
 
 }  // namespace
@@ -60,9 +67,23 @@ Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark) 
 Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event) {
     Json::Value json = Describe(event);
     if (const auto keeping = event.archived ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
-        json["note"] = keeping->note;
-        json["kept_by"] = keeping->keeper;
-        json["kept"] = Json::Int64{keeping->kept_s};
+        AddKeeping(json, *keeping);
+    }
+    return json;
+}
+
+Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::Event>& events) {
+    Json::Value json(Json::arrayValue);
+    if (events.empty()) {
+        return json;
+    }
+    const auto [first, last] = std::ranges::minmax(events, {}, &store::Event::id);
+    const std::map<int, store::Keeping> keepings = store::KeptEvents(records).FindBetween(first.id, last.id);
+    for (const store::Event& event : events) {
+        Json::Value& each = json.append(Describe(event));
+        if (const auto keeping = keepings.find(event.id); event.archived && keeping != keepings.end()) {
+            AddKeeping(each, keeping->second);
+        }
     }
     return json;
 }

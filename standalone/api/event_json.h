@@ -4,6 +4,7 @@
 #pragma once
 
 #include <optional>
+#include <vector>
 
 #include <json/json.h>
 
@@ -21,6 +22,8 @@ Json::Value Describe(const store::Event& event);
 // recordings of its footage are.
 Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark);
 Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event);
+// Of several, with one question to the store.
+Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::Event>& events);
 
 // Throws Failure 404 where there is none, or not for the caller.
 template <typename AnyEvent>

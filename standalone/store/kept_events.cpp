@@ -2,6 +2,7 @@
 #include "standalone/store/kept_events.h"
 
 #include <tuple>
+#include <utility>
 
 #include "standalone/store/connection.h"
 #include "standalone/store/query.h"
@@ -49,6 +50,12 @@ int KeptEvents::Release(std::span<const int> event_ids) {
 
 std::optional<Keeping> KeptEvents::Find(int event_id) {
     return connection_.FetchOne<Keeping>("where event_id = :id", event_id);
+}
+
+std::map<int, Keeping> KeptEvents::FindBetween(int first_event_id, int last_event_id) {
+    return connection_.FetchAll<std::pair<int, Keeping>, std::map<int, Keeping>>(
+        "select event_id, note, keeper, kept_s from kept_events where event_id >= :first and event_id <= :last",
+        first_event_id, last_event_id);
 }
 
 std::int64_t KeptEvents::SizeBytes(int mount_id) {

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <span>
 #include <string>
@@ -36,6 +37,8 @@ class KeptEvents {
 
     // Nothing for an event that is not kept.
     std::optional<Keeping> Find(int event_id);
+    // By their events, those of events that are kept from one id to the other.
+    std::map<int, Keeping> FindBetween(int first_event_id, int last_event_id);
     // What kept events take of the mount.
     std::int64_t SizeBytes(int mount_id);
 
