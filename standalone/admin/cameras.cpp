@@ -215,14 +215,12 @@ void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional
         const CameraSetup setup = ReadCamera(store, id);
         RequireCurrent(ToJson(setup), seen);
         store::Cameras(store).Remove(id);
-        if (footage == Footage::kRemove) {
-            store::Events(store).BeginDeletionOfCamera(id);
-        }
         Json::Value before = AuditJson(setup, false);
         before["footage"] = footage == Footage::kRemove ? "remove" : "keep";
         return Change{"camera.remove", Named(setup.camera.name, id), before, {}};
     });
     if (footage == Footage::kRemove) {
+        store::Events(store).BeginDeletionOfCamera(id);
         const auto until = std::chrono::steady_clock::now() + kMaxWaitForRecorder;
         while (HasOpenEvent(store, id) && std::chrono::steady_clock::now() < until) {
             std::this_thread::sleep_for(kPoll);

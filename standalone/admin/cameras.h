@@ -53,8 +53,10 @@ CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::Sour
                       std::optional<std::int64_t> seen, const CameraEdit& edit);
 
 enum class Footage { kKeep, kRemove };
-// kRemove: the recordings are out of every search at once, and the recorder deletes the files by and by. Archived ones
-// stay. Waits up to five seconds for the recorder to finish what it is writing; what it has not finished then stays.
+// kRemove: once the camera is gone, its recordings are taken out of every search, in many small transactions, and the
+// recorder deletes the files by and by. Kept ones stay. Waits up to five seconds for the recorder to finish what it is
+// writing. What is unfinished then, or left when this is interrupted or throws, stays as footage of a removed camera,
+// which the limits of its mount remove.
 void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen, Footage footage);
 
 // ids: all cameras, each once.

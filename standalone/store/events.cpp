@@ -17,6 +17,7 @@ namespace {
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::size_t kMaxCodecBytes = 32;
 constexpr int kRowsAtOnce = 10'000;
+constexpr int kRowsMovedAtOnce = 1'000;
 
 void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
     if (start_s < 0 || end_s < start_s || end_s - start_s > base::kMaxRecordingSeconds) {
@@ -135,12 +136,27 @@ void Events::BeginDeletion(std::span<const int> ids) {
 
 void Events::BeginDeletionOfCamera(int camera_id) {
     const std::string columns = Mapping<Event>::kColumns;
-    const std::string which = " from events where recording = 0 and archived = 0 and demo = 0 and camera_id = :camera";
-    connection_.Write([&](soci::session& sql) {
-        Execute(sql, "insert into events_pending_deletion (" + columns + ") select " + columns + which, camera_id);
-        Execute(sql, "delete" + which, camera_id);
-        Execute(sql, "delete from events where demo = 1 and camera_id = :camera", camera_id);
-    });
+    const std::string all = " from events where camera_id = :camera and (demo = 1 or (recording = 0 and archived = 0))";
+    const std::string next = all + " and start_s <= :start";
+    for (bool is_last = false; !is_last;) {
+        connection_.Write([&](soci::session& sql) {
+            const auto start_s =
+                FetchOne<std::int64_t>(sql, "select start_s" + all + " order by start_s limit 1 offset :rows",
+                                       camera_id, kRowsMovedAtOnce - 1);
+            const std::int64_t last_s = start_s.value_or(std::numeric_limits<std::int64_t>::max());
+            Execute(sql,
+                    "insert into events_pending_deletion (" + columns + ") select " + columns + next + " and demo = 0",
+                    camera_id, last_s);
+            // As in Move.
+            Execute(sql, "delete" + next + " and (demo = 1 or id in (select id from events_pending_deletion))",
+                    camera_id, last_s);
+            Execute(sql,
+                    "delete from events_pending_deletion where id in"
+                    " (select id from events where camera_id = :camera and start_s <= :start)",
+                    camera_id, last_s);
+            is_last = !start_s;
+        });
+    }
 }
 
 void Events::FinishDeletion(std::span<const int> ids) {

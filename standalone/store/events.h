@@ -140,7 +140,7 @@ class Events {
     void FinishDeletion(std::span<const int> ids);
     void CancelDeletion(std::span<const int> ids);     // the rows are as before
     std::vector<Event> PendingDeletion(int mount_id);  // by id
-    // BeginDeletion of all of the camera's events; its demo events go at once.
+    // BeginDeletion of all of the camera's events, its demo ones removed at once; in transactions of a thousand rows.
     void BeginDeletionOfCamera(int camera_id);
     // Removes all demo events and marks, in several transactions; returns how many. What a failure leaves the next call
     // removes.

@@ -151,6 +151,13 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     AddEvent(removed, false, false);
     const int archived = AddEvent(removed, false, true);
     const int growing = AddEvent(removed, true, false);
+    std::vector<store::Event> many(2'500, *store::Events(store_).Find(archived));
+    for (std::size_t i = 0; i < many.size(); ++i) {
+        many[i].archived = false;
+        many[i].demo = i >= 1'500;
+        many[i].start_s = many[i].end_s = static_cast<std::int64_t>(i);
+    }
+    store::Events(store_).AddAll(many);
     RemoveCamera(store_, {}, kept, std::nullopt, Footage::kKeep);
     {
         const std::jthread recorder([this, growing] {
@@ -165,7 +172,9 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     store::Events events(store_);
     EXPECT_TRUE(events.Find(other) && events.Find(archived));
     EXPECT_FALSE(events.Find(growing)) << "what was being recorded goes, too";
-    EXPECT_EQ(events.PendingDeletion(1).size(), 2);
+    EXPECT_EQ(events.PendingDeletion(1).size(), 1'502);
+    EXPECT_EQ(events.List({.camera_ids = {removed}, .begin_s = -1}).size(), 1)
+        << "of demo events, too, nothing is left";
     EXPECT_EQ(events.FootageOfCameras().at(removed).events, 1);
 }
 
