@@ -141,9 +141,9 @@ void Verify(const Console& console, const Request& request) {
     }
     console.Answer(Object("files", verification.files, "faults",
                           Array(verification.faults, [](const std::string& fault) { return Json::Value(fault); })),
-                   text, verification.files, " files were checked.");
+                   text, verification.files, verification.files == 1 ? " file is" : " files are", " unchanged.");
     if (!verification.faults.empty()) {
-        throw Failure(kFindings, "this is not the export that was made");
+        throw Failure(kFindings, "this export was changed after it was made");
     }
 }
 
@@ -154,8 +154,8 @@ void AddExport(CLI::App& program, const Console& console) {
     CLI::App* app = program.add_subcommand("export", "Takes footage of cameras away as one file, without transcoding");
     app->add_option(
            "camera", request->cameras_and_file,
-           "The cameras' ids, and last the file to create; as .zip with a list of times, gaps and hashes; - for"
-           " standard output")
+           "The cameras' ids, and last the file to create; as .zip with a manifest of times, gaps and hashes; -"
+           " for standard output")
         ->type_name("CAMERA... FILE");
     app->add_option("--from", request->from, "Footage from this time on, such as '2026-03-01 08:15' or -2h");
     app->add_option("--to", request->to, "Footage up to this time (default: now)");

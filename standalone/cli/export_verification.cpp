@@ -4,13 +4,16 @@
 #include <array>
 #include <map>
 #include <memory>
+#include <optional>
 #include <sstream>
+#include <string_view>
 
 #include <archive.h>
 #include <archive_entry.h>
 #include <unistd.h>
 
 #include "standalone/base/sha256.h"
+#include "standalone/base/text.h"
 #include "standalone/cli/console.h"
 #include "standalone/evidence/manifest.h"
 
@@ -20,6 +23,7 @@ namespace {
 
 constexpr std::size_t kBlockBytes = 1 << 16;
 constexpr std::size_t kMaxManifestBytes = 64 << 20;
+constexpr std::size_t kMaxMembers = 100'000;
 
 struct Member {
     std::string sha256;
@@ -43,6 +47,9 @@ class Zip {
         archive_entry* entry = nullptr;
         for (int result = 0; (result = archive_read_next_header(archive_.get(), &entry)) != ARCHIVE_EOF;) {
             Require(result);
+            if (members.size() == kMaxMembers) {
+                throw Failure(kDataError, file_, " holds more files than an export does");
+            }
             const char* name = archive_entry_pathname_utf8(entry);
             const std::string known = name == nullptr ? "" : name;
             if (!members.emplace(known, ReadMember(known == evidence::kManifestName)).second) {
@@ -84,12 +91,29 @@ class Zip {
     std::unique_ptr<struct archive, FreeArchive> archive_;
 };
 
+// A name as the file says it, which may be anything: nothing in it steers the terminal.
+std::string Shown(std::string_view name) {
+    std::string shown;
+    while (!name.empty()) {
+        std::string_view rest = name;
+        const std::optional<char32_t> character = base::TakeCharacter(rest);
+        const std::string_view bytes = name.substr(0, character ? name.size() - rest.size() : 1);
+        const bool is_shown = character && *character >= U' ' && (*character < 0x7F || *character >= 0xA0);
+        for (const char byte : bytes) {
+            shown +=
+                is_shown ? std::string(1, byte) : "\\x" + base::ToHex(std::array{static_cast<unsigned char>(byte)});
+        }
+        name.remove_prefix(bytes.size());
+    }
+    return shown;
+}
+
 // The hashes by the files' names.
 std::map<std::string, std::string> HashesOf(const std::string& file, const std::string& manifest) try {
     Json::Value json;
     std::istringstream(manifest) >> json;
     if (json["format"] != evidence::kManifestFormat) {
-        throw Failure(kDataError, file, " has a list of another format");
+        throw Failure(kDataError, file, " has a manifest of another format");
     }
     std::map<std::string, std::string> hashes;
     for (const Json::Value& camera : json["camera"]) {
@@ -99,7 +123,7 @@ std::map<std::string, std::string> HashesOf(const std::string& file, const std::
     }
     return hashes;
 } catch (const Json::Exception&) {
-    throw Failure(kDataError, "the list in ", file, " is damaged");
+    throw Failure(kDataError, "the manifest in ", file, " is damaged");
 }
 
 }  // namespace
@@ -117,15 +141,15 @@ ExportVerification VerifyExport(const std::string& file) {
     for (const auto& [name, sha256] : HashesOf(file, manifest.mapped().text)) {
         const auto member = members.extract(name);
         if (member.empty()) {
-            verification.faults.push_back(name + " is missing");
+            verification.faults.push_back(Shown(name) + " is missing");
         } else if (member.mapped().sha256 != sha256) {
-            verification.faults.push_back(name + " was changed");
+            verification.faults.push_back(Shown(name) + " was changed");
         } else {
             ++verification.files;
         }
     }
     for (const auto& [name, member] : members) {
-        verification.faults.push_back(name + " was added");
+        verification.faults.push_back(Shown(name) + " was added");
     }
     return verification;
 }

@@ -9,7 +9,7 @@
 namespace lookhaven::cli {
 
 struct ExportVerification {
-    int files = 0;                    // that are as the list says
+    int files = 0;                    // that are as the manifest says
     std::vector<std::string> faults;  // a sentence each
 };
 

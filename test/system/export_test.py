@@ -38,7 +38,7 @@ class ExportTest(unittest.TestCase):
             show = ["ffprobe", "-v", "error", "-show_entries", "stream=codec_name", "-of", "csv=p=0", file.name]
             return subprocess.run(show, capture_output=True, text=True, timeout=60, check=True).stdout.split()
 
-    def test_an_archive_holds_what_its_list_says(self):
+    def test_an_archive_holds_what_its_manifest_says(self):
         plan = self.ask("guard", "PlanExport", cameralists="1,2", utc_offset_min=60).json["data"]
         answer = self.ask("guard", cameralists="1,2", utc_offset_min=60)
         self.assertEqual((answer.status, answer.headers.get_content_type()), (200, "application/zip"))
@@ -57,7 +57,7 @@ class ExportTest(unittest.TestCase):
         self.assertTrue(all(camera["gap"] for camera in manifest["camera"]))
         out = Path(self.server.home) / "mine.zip"
         out.write_bytes(answer.body)
-        self.assertIn("files were checked", self.server.cli("export", "verify", str(out)))
+        self.assertIn("files are unchanged", self.server.cli("export", "verify", str(out)))
         out.write_bytes(answer.body.replace(files[0]["sha256"].encode(), b"0" * 64))
         with self.assertRaisesRegex(AssertionError, "was changed"):
             self.server.cli("export", "verify", str(out))
