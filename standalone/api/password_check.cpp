@@ -13,7 +13,8 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr std::size_t kMaxHashing = 4;  // at once, in 64 MiB each
+// Whoever is logged in can ask for hashes without end, with the right password, and must keep nobody from logging in.
+constexpr control::HashingLimits kHashingLimits{.in_all = 4, .of_users = 2, .of_user = 1};
 
 // Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
 // All machines of a link share its link-local network.
@@ -37,13 +38,13 @@ void RefuseUnlessNow(int wait_s) {
 }  // namespace
 
 HashingPlace::HashingPlace(const Call& call) : slot_(call.slot) {
-    if (!call.slots.BeginHashing(slot_, kMaxHashing)) {
+    if (!call.slots.BeginHashing(slot_, kHashingLimits)) {
         throw Failure(503, "too many log-ins at once; try again in a moment", http::kRetrySoonSeconds);
     }
 }
 
 HashingPlace::~HashingPlace() {
-    control::SlotTable::EndWork(slot_);
+    control::SlotTable::EndHashing(slot_);
 }
 
 store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password) {
@@ -77,9 +78,24 @@ store::VerifiedUser Reauthenticate(const Call& call, const std::string& paramete
     }
 }
 
-store::HashedPassword Hash(const Call& call, const Json::Value& password) {
+std::string RequireNewPassword(const Call& call, const std::string& parameter) {
+    std::string password = call.Parameter(parameter).asString();
+    store::RequirePassword(password);
+    return password;
+}
+
+store::HashedPassword Hash(const Call& call, const std::string& password) {
     const HashingPlace place(call);
-    return store::HashedPassword(password.asString());
+    return store::HashedPassword(password);
+}
+
+void RequireNoSecretInQuery(const Call& call) {
+    const Parameters query = ReadQuery(call.request);
+    for (const char* name : {"password", "newPassword", "reauth"}) {
+        if (query.contains(name)) {
+            throw Failure(400, "passwords belong in the body: URLs end up in logs and browser histories");
+        }
+    }
 }
 
 }  // namespace lookhaven::api

@@ -31,7 +31,14 @@ store::VerifiedUser CheckPassword(const Call& call, const std::string& account, 
 // of a log-in. Throws Failure 403 for a wrong one, so that a client does not take its session for ended; 429 and 503.
 store::VerifiedUser Reauthenticate(const Call& call, const std::string& parameter);
 
-// Throws Failure 503; store::InvalidRecord for what is no password; Json::Exception for what is no text.
-store::HashedPassword Hash(const Call& call, const Json::Value& password);
+// The new password of the parameter of that name, not hashed yet. To be asked before anything is hashed. Throws
+// store::InvalidRecord for what is no password; Json::Exception for what is no text.
+std::string RequireNewPassword(const Call& call, const std::string& parameter);
+
+// Throws Failure 503; store::InvalidRecord for what is no password.
+store::HashedPassword Hash(const Call& call, const std::string& password);
+
+// Throws Failure 400 for a password in the address, which ends up in logs and browser histories.
+void RequireNoSecretInQuery(const Call& call);
 
 }  // namespace lookhaven::api

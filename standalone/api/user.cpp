@@ -24,15 +24,6 @@ namespace lookhaven::api {
 
 namespace {
 
-void RequireNoSecretInQuery(const Call& call) {
-    const Parameters query = ReadQuery(call.request);
-    for (const char* name : {"password", "newPassword", "reauth"}) {
-        if (query.contains(name)) {
-            throw Failure(400, "passwords belong in the body: URLs end up in logs and browser histories");
-        }
-    }
-}
-
 int IdOf(const Call& call) {
     return call.Parameter("id").asInt();
 }
@@ -145,8 +136,9 @@ admin::UserChange RightsOf(const Call& call) {
 std::string Add(const Call& call) {
     RequireNoSecretInQuery(call);
     admin::UserChange change = RightsOf(call);
+    const std::string password = RequireNewPassword(call, "password");
     Reauthenticate(call, "reauth");
-    change.password = Hash(call, call.Parameter("password"));
+    change.password = Hash(call, password);
     return AnswerRecord(call, admin::AddUser(call.Records(), call.Actor(), call.Parameter("name").asString(), change));
 }
 
@@ -154,12 +146,15 @@ std::string Set(const Call& call) {
     RequireNoSecretInQuery(call);
     const std::int64_t seen = RevisionOf(call);
     admin::UserChange change = RightsOf(call);
-    const Json::Value& password = call.Parameter("password");
-    if (!password.isNull() || change.privilege) {
+    std::optional<std::string> password;
+    if (!call.Parameter("password").isNull()) {
+        password = RequireNewPassword(call, "password");
+    }
+    if (password || change.privilege) {
         Reauthenticate(call, "reauth");
     }
-    if (!password.isNull()) {
-        change.password = Hash(call, password);
+    if (password) {
+        change.password = Hash(call, *password);
     }
     return AnswerRecord(
         call, OnCurrent(call, [&] { return admin::SetUser(call.Records(), call.Actor(), IdOf(call), seen, change); }));
@@ -228,9 +223,10 @@ std::string Preview(const Call& call) {
 
 std::string ChangePassword(const Call& call) {
     RequireNoSecretInQuery(call);
+    const std::string password = RequireNewPassword(call, "newPassword");
     const store::VerifiedUser user = Reauthenticate(call, "password");
     try {
-        admin::ChangePassword(call.Records(), call.Actor().address, user, Hash(call, call.Parameter("newPassword")),
+        admin::ChangePassword(call.Records(), call.Actor().address, user, Hash(call, password),
                               call.login.value().session_handle);
     } catch (const store::NotFound&) {
         throw Failure(409, "the account has changed in this moment");

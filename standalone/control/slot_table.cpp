@@ -73,6 +73,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->user = 0;
     slot->pairing = 0;
     slot->work = Work::kNone;
+    slot->is_hashing = false;
     slot->player.started_us = 0;
     slot->player.key = 0;
     slot->player.is_excess = false;
@@ -157,12 +158,30 @@ bool SlotTable::BeginSearch(Slot& slot, std::size_t max_of_user) {
     return true;
 }
 
-bool SlotTable::BeginHashing(Slot& slot, std::size_t max_in_all) {
-    return BeginWork(slot, Work::kHashing, max_in_all);
+bool SlotTable::BeginHashing(Slot& slot, const HashingLimits& limits) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    const auto is_full = [&](std::size_t max, const std::function<bool(const Slot&)>& counts) {
+        return CountOthers(slot, [&](const Slot& each) { return each.is_hashing && counts(each); }) >= max;
+    };
+    const int user = slot.user;
+    if (!lock || is_full(limits.in_all, [](const Slot&) { return true; })) {
+        return false;
+    }
+    if (user != 0 && (is_full(limits.of_users, [](const Slot& each) { return each.user != 0; }) ||
+                      is_full(limits.of_user, [user](const Slot& each) { return each.user == user; }))) {
+        return false;
+    }
+    slot.is_hashing = true;
+    return true;
 }
 
 bool SlotTable::BeginProbing(Slot& slot, std::size_t max_in_all) {
-    return BeginWork(slot, Work::kProbing, max_in_all);
+    const SharedLock lock = TryLock(guard_->mutex);
+    if (!lock || CountOthers(slot, [](const Slot& each) { return each.work == Work::kProbing; }) >= max_in_all) {
+        return false;
+    }
+    slot.work = Work::kProbing;
+    return true;
 }
 
 Admission SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all) {
@@ -177,15 +196,6 @@ Admission SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_
     }
     slot.work = Work::kExport;
     return Admission::kGranted;
-}
-
-bool SlotTable::BeginWork(Slot& slot, Work work, std::size_t max_in_all) {
-    const SharedLock lock = TryLock(guard_->mutex);
-    if (!lock || CountOthers(slot, [work](const Slot& each) { return each.work == work; }) >= max_in_all) {
-        return false;
-    }
-    slot.work = work;
-    return true;
 }
 
 std::set<std::string> SlotTable::Sessions() const {

@@ -59,9 +59,15 @@ struct Player {
 enum class Work : std::uint8_t {
     kNone,
     kSearch,   // may take seconds of a processor
-    kHashing,  // of a password, in 64 MiB
     kProbing,  // of a camera, by a process of its own
     kExport,   // of footage; a search, too, until its answer turns out to be a stream
+};
+
+// How many passwords are hashed at once, in 64 MiB each. Requests admitted as a user's leave the rest to log-ins.
+struct HashingLimits {
+    std::size_t in_all;
+    std::size_t of_users;
+    std::size_t of_user;
 };
 
 enum class Admission { kGranted, kTooManyOfUser, kTooMany };
@@ -78,6 +84,7 @@ struct alignas(kSlotBytes) Slot {
     std::atomic<int> user;               // whose request was admitted; 0: none yet
     std::atomic<std::uint64_t> pairing;  // with the host that sent the request, or that it asks; 0: none
     std::atomic<Work> work;
+    std::atomic<bool> is_hashing;  // a password, beside its work
     std::array<char, 64> session;
     std::atomic<bool> has_call;
     std::array<char, 64> call;
@@ -122,13 +129,13 @@ class SlotTable {
     Admission Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all);
     // One of its user's searches, until the process ends or its answer turns out to be a stream. False: no room.
     bool BeginSearch(Slot& slot, std::size_t max_of_user);
-    // Until EndWork. False: no room.
-    bool BeginHashing(Slot& slot, std::size_t max_in_all);
+    // Until EndHashing. False: no room.
+    bool BeginHashing(Slot& slot, const HashingLimits& limits);
+    static void EndHashing(Slot& slot) { slot.is_hashing = false; }
     // Until the process ends. False: no room.
     bool BeginProbing(Slot& slot, std::size_t max_in_all);
     // Of its user's exports, until the process ends. kGranted, or for lack of room nothing is changed.
     Admission BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
-    static void EndWork(Slot& slot) { slot.work = Work::kNone; }
 
     // The sessions of running requests, unless they must end anyway.
     std::set<std::string> Sessions() const;
@@ -176,7 +183,6 @@ class SlotTable {
     static std::uint64_t PackPause(std::uint64_t serial, const Pause& pause);
     static Pause UnpackPause(std::uint64_t word);
 
-    bool BeginWork(Slot& slot, Work work, std::size_t max_in_all);
     void EndAll(const std::function<bool(const Slot&)>& is_meant);
     // How many other requests there are that count.
     std::size_t CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const;

@@ -40,12 +40,6 @@ void RequireName(std::string_view name) {
     }
 }
 
-void RequirePassword(std::string_view password) {
-    if (password.size() < kMinPasswordBytes || password.size() > kMaxPasswordBytes) {
-        throw InvalidRecord("a password has 8 to 1024 bytes");
-    }
-}
-
 // Also locks the row against a concurrent removal, where there are row locks.
 void RequireUser(soci::session& sql, int id) {
     Require(FetchOne<int>(sql, "update users set privilege = privilege where id = :id returning id", id), "account",
@@ -151,6 +145,12 @@ std::optional<Account> FetchByName(Connection& connection, std::string_view name
 }
 
 }  // namespace
+
+void RequirePassword(std::string_view password) {
+    if (password.size() < kMinPasswordBytes || password.size() > kMaxPasswordBytes) {
+        throw InvalidRecord("a password has 8 to 1024 bytes");
+    }
+}
 
 HashedPassword::HashedPassword(std::string_view password)
     : text_((RequirePassword(password), HashPassword(password))) {}

@@ -46,10 +46,13 @@ struct Denials {
     std::map<DeniableItem, std::set<int>> items;
 };
 
+// Throws InvalidRecord unless the password has 8 to 1,024 bytes. Costs nothing, unlike its hash.
+void RequirePassword(std::string_view password);
+
 // A password as the store keeps it.
 class HashedPassword {
   public:
-    // Takes a tenth of a second and 64 MiB. Throws InvalidRecord unless the password has 8 to 1,024 bytes.
+    // Takes a tenth of a second and 64 MiB. Throws as RequirePassword does.
     explicit HashedPassword(std::string_view password);
     const std::string& Text() const { return text_; }
 

@@ -3,7 +3,9 @@
 // Who may call, and what a caller without a session or with narrowed rights is refused: each row is an attack.
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -108,6 +110,27 @@ TEST_F(Admission, FewPasswordsAreHashedAtOnce) {
     attempts.clear();
     EXPECT_TRUE(host::Eventually(std::chrono::seconds(3), [&] { return host_.RequestProcesses() == 0; }));
     EXPECT_EQ(Status(login, false, "account=admin&password=right+password"), 200) << "what was cut off gives way";
+}
+
+TEST_F(Admission, WhoIsLoggedInKeepsNobodyFromLoggingIn) {
+    const std::string guest = host_.LogIn("guest").secret;
+    std::atomic<int> refused = 0;
+    std::vector<std::jthread> loops;
+    for (int i = 0; i < 4; ++i) {
+        loops.emplace_back([&](const std::stop_token& end) {
+            while (!end.stop_requested()) {
+                const int status = host_
+                                       .Ask("api=VEXO.User&version=1&method=ChangePassword", guest, {},
+                                            "password=other+password&newPassword=other+password")
+                                       .status;
+                refused += status == 503 ? 1 : 0;
+            }
+        });
+    }
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_EQ(Status("api=VEXO.Auth&version=1&method=Login", false, "account=admin&password=right+password"), 200);
+    }
+    EXPECT_TRUE(host::Eventually(std::chrono::seconds(5), [&] { return refused > 0; })) << "one hash at a time";
 }
 
 TEST_F(Admission, LogInsAndRefusalsAreLoggedCleanly) {

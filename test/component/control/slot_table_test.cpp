@@ -46,11 +46,11 @@ TEST(SlotTable, IsNotOvershotByABurst) {
     }
     ASSERT_EQ(table.Take(), nullptr);
     const auto admit = [&table](Slot& slot) { return table.Admit(slot, 7, 5, 100) == Admission::kGranted; };
-    const auto hash = [&table](Slot& slot) { return table.BeginHashing(slot, 4); };
+    const auto hash = [&table](Slot& slot) { return table.BeginHashing(slot, {4, 4, 4}); };
     EXPECT_EQ(SucceedAtOnce(slots, admit), 5);
     EXPECT_EQ(SucceedAtOnce(slots, hash), 4);
     EXPECT_EQ(table.Admit(*slots[0], 8, 5, 5), slots[0]->user == 7 ? Admission::kGranted : Admission::kTooMany);
-    const auto other = std::ranges::find(slots, Work::kNone, [](const Slot* slot) { return slot->work.load(); });
+    const auto other = std::ranges::find(slots, false, [](const Slot* slot) { return slot->is_hashing.load(); });
     EXPECT_FALSE(hash(**other)) << "the host has not reaped those that ended";
     for (Slot* slot : slots) {
         table.Free(*slot);
@@ -79,6 +79,25 @@ TEST(SlotTable, ExportsAreFewAndSearchesUntilTheyAreSent) {
     EXPECT_EQ(table.BeginExport(*slots[2], 2, 3), Admission::kGranted);
 }
 
+TEST(SlotTable, LeavesLogInsRoomToHashAndSearchesTheirMark) {
+    SlotTable table(7);
+    Slot* last = nullptr;
+    const auto hash = [&](int user) {
+        last = table.Take();
+        last->user = user;
+        last->work = Work::kSearch;
+        return table.BeginHashing(*last, {.in_all = 4, .of_users = 2, .of_user = 1});
+    };
+    EXPECT_TRUE(hash(7));
+    EXPECT_FALSE(hash(7)) << "one of a user";
+    EXPECT_TRUE(hash(8));
+    EXPECT_FALSE(hash(9)) << "two of all users";
+    EXPECT_TRUE(hash(0) && hash(0)) << "log-ins have the rest";
+    SlotTable::EndHashing(*last);
+    EXPECT_EQ(last->work, Work::kSearch);
+    EXPECT_TRUE(hash(0));
+}
+
 TEST(SlotTable, SurvivesAProcessKilledInTheMidstOfIt) {
     SlotTable table(2);
     Slot& slot = *table.Take();
@@ -86,13 +105,13 @@ TEST(SlotTable, SurvivesAProcessKilledInTheMidstOfIt) {
         const pid_t child = fork();
         if (child == 0) {
             for (;;) {
-                table.BeginHashing(slot, 1);
+                table.BeginHashing(slot, {1, 1, 1});
             }
         }
         usleep(static_cast<useconds_t>(i * 20));
         kill(child, SIGKILL);
         waitpid(child, nullptr, 0);
-        ASSERT_TRUE(table.BeginHashing(slot, 1)) << i;
+        ASSERT_TRUE(table.BeginHashing(slot, {1, 1, 1})) << i;
     }
 }
 
