@@ -10,6 +10,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/camera_page.h"
+#include "standalone/api/password_check.h"
 #include "standalone/api/probe.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
@@ -108,6 +109,7 @@ auto OrStale(const Call& call, Change&& change) {
 }
 
 std::string Add(const Call& call) {
+    RequireNoSecretInQuery(call);
     admin::CameraSetup setup;
     setup.camera.enabled = true;
     TakeCameraFields(call, setup);
@@ -116,6 +118,7 @@ std::string Add(const Call& call) {
 }
 
 std::string Set(const Call& call) {
+    RequireNoSecretInQuery(call);
     return OrStale(call, [&] {
         return CameraAnswer(call, admin::SetCamera(call.Records(), call.Actor(), camera::NetworkKinds(),
                                                    RequireId(call), RequireNumber(call, "revision"),

@@ -122,21 +122,32 @@ void TakeGroups(const Json::Value& list, std::set<int>& groups) {
     }
 }
 
-std::string HostOf(const std::string& address) {
-    const std::size_t scheme = address.find("://");
-    if (scheme == address.npos) {
-        return "";
-    }
-    const std::string rest = address.substr(scheme + 3, address.find_first_of("/?#", scheme + 3) - scheme - 3);
-    return rest.substr(0, rest.starts_with('[') ? rest.find(']') : rest.find(':'));
+std::string DefaultPort(const std::string& scheme) {
+    return scheme == "rtsp" ? "554" : scheme == "http" ? "80" : scheme == "https" ? "443" : "";
 }
 
-std::set<std::string> HostsOf(const store::Camera& camera) {
-    std::set<std::string> hosts;
-    for (const CameraProfile& profile : camera.profiles) {
-        hosts.insert(HostOf(profile.source));
+// Whom an address sends a password to: scheme, host and port. Empty for what is not in the network.
+std::string ServerOf(const std::string& address) {
+    const std::size_t scheme_end = address.find("://");
+    if (scheme_end == address.npos) {
+        return "";
     }
-    return hosts;
+    const std::size_t begin = scheme_end + 3;
+    const std::string place = address.substr(begin, address.find_first_of("/?#", begin) - begin);
+    const std::size_t colon = place.find(':', place.starts_with('[') ? std::min(place.find(']'), place.size()) : 0);
+    const std::string scheme = address.substr(0, scheme_end);
+    const std::string port = colon == place.npos ? "" : place.substr(colon + 1);
+    std::string server = scheme + "://" + place.substr(0, colon) + ':' + (port.empty() ? DefaultPort(scheme) : port);
+    std::ranges::transform(server, server.begin(), [](char c) { return c >= 'A' && c <= 'Z' ? char(c + 32) : c; });
+    return server;
+}
+
+std::set<std::string> ServersOf(const store::Camera& camera) {
+    std::set<std::string> servers;
+    for (const CameraProfile& profile : camera.profiles) {
+        servers.insert(ServerOf(profile.source));
+    }
+    return servers;
 }
 
 std::string LiveAddress(const store::Camera& camera) {
@@ -159,15 +170,19 @@ void TakeField(const Call& call, const char* name, std::string& target) {
 }
 
 std::optional<store::Credentials> TakeCredentials(const Call& call, const admin::CameraSetup& stored,
-                                                  const std::vector<std::string>& addresses) {
+                                                  const std::vector<std::string>& addresses, bool insecure) {
     store::Credentials credentials = stored.credentials.value_or(store::Credentials());
     TakeField(call, "account", credentials.account);
     TakeField(call, "password", credentials.password);
-    const std::set<std::string> hosts = HostsOf(stored.camera);
-    const bool goes_elsewhere = std::ranges::any_of(
-        addresses, [&hosts](const std::string& address) { return !hosts.contains(HostOf(address)); });
+    const std::set<std::string> servers = ServersOf(stored.camera);
+    const bool goes_elsewhere =
+        (insecure && !stored.camera.insecure) || std::ranges::any_of(addresses, [&](const std::string& address) {
+            return !servers.contains(ServerOf(address));
+        });
     if (goes_elsewhere && call.Parameter("password").isNull() && !credentials.password.empty()) {
-        throw Failure(400, "password must be given again for an address of another host");
+        throw Failure(400,
+                      "password must be given again for another scheme, host or port, or once certificates are not "
+                      "verified");
     }
     return credentials.account.empty() && credentials.password.empty() ? std::nullopt : std::optional(credentials);
 }
@@ -191,7 +206,7 @@ void TakeCameraFields(const Call& call, admin::CameraSetup& setup) {
     for (const CameraProfile& profile : camera.profiles) {
         addresses.push_back(profile.source);
     }
-    setup.credentials = TakeCredentials(call, before, addresses);
+    setup.credentials = TakeCredentials(call, before, addresses, camera.insecure);
     TakeGroups(call.Parameter("group"), setup.groups);
     TakePlan(call.Parameter("plan"), setup.plan);
 }

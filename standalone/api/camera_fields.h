@@ -16,12 +16,14 @@ void TakeField(const Call& call, const char* name, bool& target);
 void TakeField(const Call& call, const char* name, int& target);
 void TakeField(const Call& call, const char* name, std::string& target);
 
-// Changes in the setup what the call names. A stored password goes to no other host than those that the camera has had:
-// whoever may replace it may not read it. Throws Failure 400.
+// Changes in the setup what the call names. A stored password goes to no other server (scheme, host, port) than those
+// that the camera has, nor to one whose certificate is no longer verified: whoever may replace it may not read it.
+// Throws Failure 400.
 void TakeCameraFields(const Call& call, admin::CameraSetup& setup);
 
-// The account and password of the call for that address; those stored where it names none. Throws Failure 400 as above.
+// The account and password of the call for those addresses; those stored where it names none. Throws Failure 400 as
+// above.
 std::optional<store::Credentials> TakeCredentials(const Call& call, const admin::CameraSetup& stored,
-                                                  const std::vector<std::string>& addresses);
+                                                  const std::vector<std::string>& addresses, bool insecure);
 
 }  // namespace lookhaven::api

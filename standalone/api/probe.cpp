@@ -8,6 +8,7 @@
 
 #include "standalone/admin/camera_stream.h"
 #include "standalone/api/camera_fields.h"
+#include "standalone/api/password_check.h"
 #include "standalone/api/still_picture.h"
 #include "standalone/camera/isolated_source.h"
 
@@ -63,6 +64,7 @@ Json::Value Describe(const Call& call, media::ProbeResult found) {
 }  // namespace
 
 std::string ProbeCamera(const Call& call) {
+    RequireNoSecretInQuery(call);
     std::string address;
     bool is_insecure = false;
     int id = 0;
@@ -73,10 +75,9 @@ std::string ProbeCamera(const Call& call) {
     const admin::CameraSetup stored = id == 0 ? admin::CameraSetup() : admin::ReadCamera(call.Records(), id);
     const media::SourceKinds kinds = camera::NetworkKinds();
     admin::RequireSource(kinds, address);
-    const std::optional<store::Credentials> credentials = TakeCredentials(call, stored, {address});
+    const std::optional<store::Credentials> credentials = TakeCredentials(call, stored, {address}, is_insecure);
     if (!call.slots.BeginProbing(call.slot, kMaxProbes)) {
-        throw Failure(429, "several cameras are being looked at already; try again in a moment",
-                      http::kRetrySoonSeconds);
+        throw Failure(429, "three cameras are being tested already; try again in a moment", http::kRetrySoonSeconds);
     }
     call.context.CloseRecords();
     try {
