@@ -3,10 +3,9 @@
 
 #include <vector>
 
+#include "standalone/admin/kept_events.h"
 #include "standalone/api/event_json.h"
 #include "standalone/api/footage.h"
-#include "standalone/base/clock.h"
-#include "standalone/store/kept_events.h"
 
 namespace lookhaven::api {
 
@@ -24,11 +23,6 @@ std::vector<store::Event> RequireRecordings(const Call& call) {
     return {*event};
 }
 
-store::Keeping KeepingOf(const Call& call) {
-    const auto user = store::Users(call.Records()).Find(static_cast<int>(call.context.Caller()));
-    return {call.Parameter("note").asString(), user ? user->name : "", base::WallSeconds()};
-}
-
 }  // namespace
 
 std::string Keep(const Call& call) {
@@ -40,8 +34,9 @@ std::string Keep(const Call& call) {
         ids.push_back(event.id);
     }
     const Json::Value& keep = call.Parameter("keep");
-    store::KeptEvents kept(call.Records());
-    const int changed = keep.isNull() || keep.asBool() ? kept.Keep(ids, KeepingOf(call)) : kept.Release(ids);
+    const int changed = keep.isNull() || keep.asBool()
+                            ? admin::KeepEvents(call.Records(), call.Actor(), ids, call.Parameter("note").asString())
+                            : admin::ReleaseEvents(call.Records(), call.Actor(), ids);
     if (changed == 0) {  // deleted meanwhile, or nothing of it was recorded
         throw Failure(404, "there is no such event");
     }

@@ -8,6 +8,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "standalone/admin/kept_events.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/cli/command_group.h"
@@ -163,21 +164,23 @@ void ChangeKeeping(const Console& console, const Request& request, const auto& c
     for (const Event& event : found.event ? std::vector{*found.event} : store::RecordingsOf(store, *found.mark)) {
         ids.push_back(event.id);
     }
-    if (store::KeptEvents kept(store); change(kept, ids) == 0) {
+    if (change(store, ids) == 0) {
         throw Failure(kNoInput, "there is no footage of event ", request.id);
     }
     console.Answer(Array(ids, [&](int id) { return ToData(*Events(store).Find(id)); }), "Event ", request.id, what);
 }
 
 void Keep(const Console& console, const Request& request) {
-    const auto keep = [&](store::KeptEvents& kept, const std::vector<int>& ids) {
-        return kept.Keep(ids, {request.note, "", base::WallSeconds()});
+    const auto keep = [&](store::Store& store, const std::vector<int>& ids) {
+        return admin::KeepEvents(store, {}, ids, request.note);
     };
     ChangeKeeping(console, request, keep, " is kept beyond its mount's limits.");
 }
 
 void Release(const Console& console, const Request& request) {
-    const auto release = [](store::KeptEvents& kept, const std::vector<int>& ids) { return kept.Release(ids); };
+    const auto release = [](store::Store& store, const std::vector<int>& ids) {
+        return admin::ReleaseEvents(store, {}, ids);
+    };
     ChangeKeeping(console, request, release, " is no longer kept.");
 }
 

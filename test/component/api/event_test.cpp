@@ -220,6 +220,15 @@ TEST_F(EventApi, KeepsWhatAManagerSaysAndTellsWhoDid) {
     EXPECT_EQ(kept(false), std::to_string(hidden) + "admin " + kept(true));
     EXPECT_EQ(Ask(keep, id + "&keep=false").Json()["data"]["event"][0]["archived"], false);
     EXPECT_EQ(kept(true), "");
+    std::string told;
+    const Json::Value log = Ask("System&version=1&method=Audit", "limit=9").Json();
+    for (const Json::Value& entry : log["data"]["entry"]) {
+        told += entry["action"].asString() + ' ' + entry["object"].asString() + ' ' +
+                entry["before"]["note"].asString() + '>' + entry["after"]["keeper"].asString() + ' ';
+    }
+    EXPECT_EQ(told, "event.release Entrance (1), event " + std::to_string(event) +
+                        " police> event.keep Straße (2), event " + std::to_string(hidden) +
+                        " >admin event.keep Entrance (1), event " + std::to_string(event) + " >admin ");
 }
 
 TEST_F(EventApi, WalksThroughWhatCanBePlayed) {

@@ -1,0 +1,20 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Keeps recordings from retention, or gives them back to it; the audit log tells who did.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "standalone/admin/actor.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::admin {
+
+// Of those of the recordings that exist; all of them or, where it throws, none. Each returns how many there were. An
+// account becomes their keeper by its name, the command line without one. Throw what Apply throws; KeepEvents
+// store::InvalidRecord for what is no note.
+int KeepEvents(store::Store& store, const Actor& actor, const std::vector<int>& ids, const std::string& note);
+int ReleaseEvents(store::Store& store, const Actor& actor, const std::vector<int>& ids);
+
+}  // namespace lookhaven::admin
