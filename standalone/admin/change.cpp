@@ -7,6 +7,7 @@
 #include "standalone/store/audit_log.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/transaction.h"
+#include "standalone/store/users.h"
 
 namespace lookhaven::admin {
 
@@ -27,6 +28,7 @@ std::string AuditText(const Json::Value& record) {
 
 void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
     store::InTransaction(store, [&] {
+        store::Users(store).Lock();  // who may make this change may do so until it is made
         RequireManager(store, actor);
         const Change change = make();
         if (change.before != change.after) {

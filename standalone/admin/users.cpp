@@ -109,7 +109,6 @@ Json::Value AddUser(store::Store& store, const Actor& actor, const std::string& 
     Json::Value record;
     Apply(store, actor, [&] {
         Users users(store);
-        users.Lock();
         const Privilege privilege = change.privilege.value_or(Privilege::kViewer);
         RequireMayManage(users, actor, privilege);
         const User user = users.Add(name, change.password.value(), privilege);
@@ -124,7 +123,6 @@ Json::Value SetUser(store::Store& store, const Actor& actor, int id, std::option
     Json::Value record;
     Apply(store, actor, [&] {
         Users users(store);
-        users.Lock();
         const User user = RequireUser(users, id);
         RequireMayManage(users, actor, user.privilege);
         RequireMayManage(users, actor, change.privilege.value_or(user.privilege));
@@ -142,7 +140,6 @@ Json::Value SetUser(store::Store& store, const Actor& actor, int id, std::option
 void RemoveUser(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen) {
     Apply(store, actor, [&] {
         Users users(store);
-        users.Lock();
         const User user = RequireUser(users, id);
         RequireMayManage(users, actor, user.privilege);
         const Json::Value before = UserRecord(store, user);

@@ -119,6 +119,23 @@ TEST_P(UserTest, OfTwoOwnersWhoDemoteEachOtherAtOnceOneStays) {
     }
 }
 
+TEST_P(UserTest, AManagerStaysOneUntilHisChangeIsMade) {
+    std::atomic<bool> demoted = false;
+    std::jthread other;
+    Apply(store_, manager_, [&] {
+        other = std::jthread([&] {
+            store::Store store = store::Store::Open(url_);
+            SetUser(store, {}, manager_.user_id, {}, {.privilege = Privilege::kViewer});
+            demoted = true;
+        });
+        std::this_thread::sleep_for(std::chrono::milliseconds(200));
+        EXPECT_FALSE(demoted);
+        return Change();
+    });
+    other.join();
+    EXPECT_EQ(PrivilegeOf(manager_), Privilege::kViewer);
+}
+
 TEST_P(UserTest, TheAuditLogTellsOfAPasswordAndNeverWhichOne) {
     SetUser(store_, manager_, viewer_.user_id, {}, {.password = store::HashedPassword("battery staple")});
     ChangePassword(store_, "192.0.2.9", *users_.CheckPassword("viewer", "battery staple"), password_, "");
