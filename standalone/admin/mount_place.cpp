@@ -60,12 +60,19 @@ bool IsSame(const struct stat& one, const struct stat& other) {
     return one.st_dev == other.st_dev && one.st_ino == other.st_ino;
 }
 
-// Only root and the server's own user can put something else in the place of what is in it.
-bool IsSafeParent(const struct stat& status) {
+// Whether root or the server's own user has it, and nobody else can write to it.
+bool IsOwn(const struct stat& status) {
     const bool is_own_group = status.st_gid == 0 || status.st_gid == ::getegid();
     const mode_t strangers = S_IWOTH | (is_own_group ? 0U : S_IWGRP);
-    return (status.st_uid == 0 || status.st_uid == ::geteuid()) &&
-           ((status.st_mode & strangers) == 0 || (status.st_mode & S_ISVTX) != 0);
+    return (status.st_uid == 0 || status.st_uid == ::geteuid()) && (status.st_mode & strangers) == 0;
+}
+
+// Nobody else can put something in the place of what is in it.
+bool IsSafeParent(struct stat status) {
+    if ((status.st_mode & S_ISVTX) != 0) {
+        status.st_mode &= ~mode_t{S_IWGRP | S_IWOTH};
+    }
+    return IsOwn(status);
 }
 
 // Goes down from the root without following a link.
@@ -88,6 +95,9 @@ void RequireSafePath(const base::Installation& installation, const std::string& 
         if (IsSame(StatusOf(folder, path), home)) {
             Refuse(path, "it lies in the state folder");
         }
+    }
+    if (!IsOwn(StatusOf(folder, path))) {
+        Refuse(path, "others than root and the server's account own it or can write to it");
     }
     if (IsBelow(fs::canonical(installation.Home()).string(), path)) {
         Refuse(path, "the state folder lies in it");

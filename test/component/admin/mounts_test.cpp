@@ -78,6 +78,7 @@ TEST_P(MountTest, AnAccountMayAddOnlyWhatNobodyElseUsesOrCouldExchange) {
     MakeFolder("disks/empty/lost+found");
     MakeFolder("disks/open/inside");
     MakeFolder("disks/open", 0777);
+    MakeFolder("disks/sticky", 01777);
     std::ofstream(MakeFolder("disks/full") + "/index.html") << "x";
     MakeFolder("disks/home/recordings");
     MakeFolder("elsewhere");
@@ -107,7 +108,8 @@ TEST_P(MountTest, AnAccountMayAddOnlyWhatNobodyElseUsesOrCouldExchange) {
         {disks + "/home", "state folder"},
         {disks + "/home/recordings", "state folder"},
         {disks + "/open/inside", "others"},
-        {disks + "/open", "not empty"},
+        {disks + "/open", "can write to it"},
+        {disks + "/sticky", "can write to it"},
         {disks + "/empty", ""},
         {disks + "/gone", ""},
     };
