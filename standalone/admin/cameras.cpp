@@ -21,6 +21,7 @@ using store::CameraGroup;
 using store::CameraProfile;
 using store::RecordingPlan;
 
+constexpr std::size_t kMaxCameras = 1'000;
 constexpr std::chrono::milliseconds kMaxWaitForRecorder{5'000};
 constexpr std::chrono::milliseconds kPoll{100};
 
@@ -173,6 +174,9 @@ CameraSetup AddCamera(store::Store& store, const Actor& actor, const media::Sour
     }
     Apply(store, actor, [&] {
         store::Cameras cameras(store);
+        if (cameras.List().size() >= kMaxCameras) {
+            throw store::InvalidRecord("there are 1,000 cameras already, and no more are possible");
+        }
         setup.camera.id = cameras.Add(setup.camera);
         if (setup.credentials) {
             cameras.SetCredentials(setup.camera.id, setup.credentials);

@@ -24,7 +24,7 @@ namespace lookhaven::admin {
 struct CameraSetup {
     store::Camera camera;  // id 0 before it is added
     std::optional<store::Credentials> credentials;
-    std::optional<store::RecordingPlan> plan;  // nothing: it is not recorded, and not kept ready for marks
+    std::optional<store::RecordingPlan> plan;  // nothing: around marks only, without footage from before
     std::set<int> groups;
 };
 
@@ -43,8 +43,8 @@ CameraSetup ReadCamera(store::Store& store, int id);
 Json::Value ToJson(const CameraSetup& setup);
 
 // Each of these checks the addresses that are new; where one throws, nothing was changed. They throw what Apply throws,
-// InvalidRecord, NotFound, and Stale, whose record is that of ToJson, for another revision than the one seen and for a
-// change made by somebody else while the edit ran.
+// InvalidRecord (for more than 1,000 cameras, too), NotFound, and Stale, whose record is that of ToJson, for another
+// revision than the one seen and for a change made by somebody else while the edit ran.
 //
 // prepare: may look at the stream, which takes seconds, and fill in what it finds. Called before anything is stored.
 CameraSetup AddCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, CameraSetup setup,

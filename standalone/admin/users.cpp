@@ -57,6 +57,17 @@ void RequireCameras(store::Store& store, const store::Denials& before, const sto
     }
 }
 
+// Items need not exist, so nothing else bounds their number. What is denied already may stay.
+void RequireFewItems(const store::Denials& before, const store::Denials& after) {
+    constexpr std::size_t kMaxItems = 1'000;
+    for (const auto& [kind, ids] : after.items) {
+        const auto known = before.items.find(kind);
+        if (ids.size() > kMaxItems && (known == before.items.end() || !std::ranges::includes(known->second, ids))) {
+            throw store::InvalidRecord("an account is denied at most 1,000 items of a kind");
+        }
+    }
+}
+
 void SetMayMark(Users& users, const User& user, bool may_mark, bool is_new_privilege) {
     if (user.IsManager()) {
         // Who makes somebody a manager has said that.
@@ -89,6 +100,7 @@ Json::Value Make(store::Store& store, const User& before, const UserChange& chan
         store::Denials wanted = denied;
         change.denials(wanted);
         RequireCameras(store, denied, wanted);
+        RequireFewItems(denied, wanted);
         users.SetDenials(before.id, wanted);
     }
     return UserRecord(store, RequireUser(users, before.id));

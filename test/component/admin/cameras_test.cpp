@@ -10,6 +10,7 @@
 #include "standalone/store/audit_log.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
+#include "standalone/store/transaction.h"
 #include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
@@ -176,6 +177,16 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     EXPECT_EQ(events.List({.camera_ids = {removed}, .begin_s = -1}).size(), 1)
         << "of demo events, too, nothing is left";
     EXPECT_EQ(events.FootageOfCameras().at(removed).events, 1);
+}
+
+TEST_P(CameraChangeTest, AHostHasAThousandCamerasAtMost) {
+    store::InTransaction(store_, [this] {
+        for (int i = 1; i < 1'000; ++i) {
+            AddCamera();
+        }
+    });
+    AddGate();
+    EXPECT_THROW(AddGate(), store::InvalidRecord);
 }
 
 TEST_P(CameraChangeTest, IsForManagersHereToo) {

@@ -174,6 +174,17 @@ TEST_P(UserTest, DenialsAreReplacedAsAWholeOrNotAtAll) {
     SetUser(store_, {}, viewer_.user_id, record["revision"].asInt64(), {.denials = deny(R"({"live": [1]})")});
     EXPECT_THAT(users_.DeniedCameras(viewer_.user_id, CameraAccess::kLive), ElementsAre(1)) << "its footage is there";
     EXPECT_THAT(users_.DeniedCameras(viewer_.user_id, CameraAccess::kAudio), IsEmpty());
+    const auto deny_doors = [&](int count) {
+        return Outcome([&] {
+            SetUser(store_, {}, viewer_.user_id, {}, {.denials = [count](store::Denials& denials) {
+                        for (int id = 1; id <= count; ++id) {
+                            denials.items[store::DeniableItem::kDoor].insert(id);
+                        }
+                    }});
+        });
+    };
+    EXPECT_EQ(deny_doors(1'001), "invalid");
+    EXPECT_EQ(deny_doors(1'000), "done");
     for (const char* wrong : {"[]", "5", R"({"live": 1})", R"({"live": [0]})", R"({"live": ["1"]})", R"({"liv": [1]})",
                               R"({"group": []})", R"({"group": {"door": [1]}})", R"({"emap": [1.5]})"}) {
         EXPECT_THROW(DenialsFrom(parse(wrong)), store::InvalidRecord) << wrong;
