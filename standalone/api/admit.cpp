@@ -69,6 +69,11 @@ CostClass CostClassOf(const Call& call) {
     if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || probes_camera || IsPlayer(call)) {
         return CostClass::kPictures;
     }
+    const bool counts_footage =
+        call.api == kCameraApi.name && call.method == "List" && call.Parameter("footage") != Json::Value(false);
+    if (counts_footage) {
+        return CostClass::kSearch;
+    }
     const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name ||
                           call.api == kSystemApi.name || call.api == kCameraApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
