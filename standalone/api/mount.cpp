@@ -95,12 +95,14 @@ Condition ConditionOf(store::Store& records, const store::Mount& mount, const Su
     }
     for (const maintenance::MountStatus& status : known.states) {
         const bool tells_more = status.state == MountState::kInUse || status.state == MountState::kFailing ||
-                                status.state == MountState::kSpaceHeld;
+                                status.state == MountState::kSpaceHeld || status.state == MountState::kKeptFull;
         if (status.mount == mount.id && condition.state == "ready" && tells_more) {
             condition.state = maintenance::NameOf(status.state);
             condition.message = status.state == MountState::kInUse       ? "another recorder works on it"
                                 : status.state == MountState::kSpaceHeld ? "what was deleted does not become free"
-                                                                         : status.reason;
+                                : status.state == MountState::kKeptFull
+                                    ? "kept recordings alone reach its limit: everything else is deleted at once"
+                                    : status.reason;
         }
     }
     return condition;

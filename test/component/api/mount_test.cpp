@@ -5,7 +5,9 @@
 #include <gtest/gtest.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
+#include "standalone/maintenance/mount_status.h"
 #include "standalone/store/settings.h"
 #include "test/support/footage/footage.h"
 #include "test/support/host/host_under_test.h"
@@ -58,6 +60,9 @@ TEST(MountApi, ADiskIsAddedToldOfLimitedAndRemoved) {
     EXPECT_EQ(ask("Set", seen + R"(, "limitDays": 1, "confirm": true})").status, 200);
     EXPECT_EQ(ask("Set", seen + "}").Json()["error"]["data"]["limit"]["days"].asDouble(), 1);
     EXPECT_EQ(ask("Remove", R"({"id": 2, "revision": )" + mount["revision"].asString() + "}").status, 200);
+    maintenance::WriteMountStatus(host.Home(), {{footage.MountId(), maintenance::MountState::kKeptFull, ""}});
+    control::CommonConfigKeeper(host.Home()).Refresh(false);
+    EXPECT_EQ(ask("List", "{}").Json()["data"]["mount"][0]["state"], "kept-full");
     std::filesystem::remove(footage.Mount() / maintenance::kMarkerName);
     EXPECT_EQ(ask("List", "{}").Json()["data"]["mount"][0]["state"], "absent");
 }
