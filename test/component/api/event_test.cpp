@@ -90,7 +90,8 @@ TEST_F(EventApi, RefusesBadInput) {
     const std::int64_t now_s = base::WallSeconds();
     const std::string late = std::to_string(now_s + 600);
     const std::string early = std::to_string(now_s - 600);
-    const store::Event small{.camera_id = 3, .mount_id = 9, .start_s = 3'000'000, .end_s = 3'000'001};
+    store::Event small;
+    small.camera_id = 3, small.mount_id = 9, small.start_s = 3'000'000, small.end_s = 3'000'001;
     store::Events(footage_.Records()).AddAll(std::vector(20'001, small));
     std::string many;
     for (int id = 1; id <= 1001; ++id) {
