@@ -90,9 +90,6 @@ TEST_F(EventApi, RefusesBadInput) {
     const std::int64_t now_s = base::WallSeconds();
     const std::string late = std::to_string(now_s + 600);
     const std::string early = std::to_string(now_s - 600);
-    store::Event small;
-    small.camera_id = 3, small.mount_id = 9, small.start_s = 3'000'000, small.end_s = 3'000'001;
-    store::Events(footage_.Records()).AddAll(std::vector(20'001, small));
     std::string many;
     for (int id = 1; id <= 1001; ++id) {
         many += std::to_string(id) + ",";
@@ -154,7 +151,6 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Export&from=1000000&to=1000010&cameralists=1", "", 404},
         {"Event&version=1&method=Export&from=1000000&to=1000010&cameralists=1,99", "", 404},
         {"Event&version=1&method=PlanExport&from=1000000&to=1000010&cameralists=2", "", 404, true},
-        {"Event&version=1&method=PlanExport&from=2999990&to=3000010&cameralists=3", "", 400},
         {"Event&version=1&method=Get&event=99", "", 404},
         {"Event&version=1&method=Get&event=x", "", 400},
         {"Event&version=2&method=List", "", 404},
@@ -166,6 +162,10 @@ TEST_F(EventApi, RefusesBadInput) {
         const Answer answer = Ask(each.query, each.form, each.as_viewer);
         EXPECT_EQ(answer.status, each.status) << each.query << ' ' << each.form.substr(0, 80) << answer.body;
     }
+    store::Event small;
+    small.camera_id = 3, small.mount_id = 9, small.start_s = 3'000'000, small.end_s = 3'000'001;
+    store::Events(footage_.Records()).AddAll(std::vector(20'001, small));
+    EXPECT_EQ(Ask("Event&version=1&method=PlanExport&from=2999990&to=3000010&cameralists=3").status, 400) << "too many";
     EXPECT_TRUE(store::Marks(footage_.Records()).Pending().empty());
     for (const char* api :
          {"Event&version=1&method=List", "Catalog&version=1&method=Groups", "Playback&version=1&method=GetPosition"}) {
