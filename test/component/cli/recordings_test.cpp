@@ -75,7 +75,7 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
     std::ofstream(zip, std::ios::binary) << bytes;
     test::Shell("python3 -c \"import sys, zipfile; zipfile.ZipFile(sys.argv[1], 'a').writestr('\\x1b]0;x', '')\" " +
                 zip);
-    Play({{"export verify " + zip, 1, "was changed", "\\x1b]0;x was added"},
+    Play({{"export verify " + zip, 1, "was changed\n\\x1b]0;x was added", "\x1b"},
           {"export 1 --from -1d - >" + zip + ".mkv", 0, ""}});
     EXPECT_THAT(test::Probe(zip + ".mkv"), testing::StartsWith("mjpeg,"));
 
