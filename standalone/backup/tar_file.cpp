@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/backup/tar_file.h"
 
-#include <array>
 #include <cerrno>
 #include <new>
 #include <system_error>
@@ -10,11 +9,11 @@
 #include <archive.h>
 #include <archive_entry.h>
 #include <fcntl.h>
-#include <sodium.h>
 #include <sys/stat.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
+#include "standalone/base/sha256.h"
 
 namespace lookhaven::backup {
 
@@ -22,28 +21,6 @@ namespace {
 
 constexpr std::size_t kBlockBytes = std::size_t{64} << 10U;
 constexpr unsigned int kPrivate = 0600;
-
-class Sha256 {
-  public:
-    Sha256() { crypto_hash_sha256_init(&state_); }
-
-    void Add(const void* data, std::size_t size) {
-        crypto_hash_sha256_update(&state_, static_cast<const unsigned char*>(data), size);
-        size_bytes_ += static_cast<std::int64_t>(size);
-    }
-
-    FileDigest Finish() {
-        std::array<unsigned char, crypto_hash_sha256_BYTES> hash{};
-        crypto_hash_sha256_final(&state_, hash.data());
-        std::array<char, 2 * crypto_hash_sha256_BYTES + 1> digits{};
-        sodium_bin2hex(digits.data(), digits.size(), hash.data(), hash.size());
-        return {size_bytes_, digits.data()};
-    }
-
-  private:
-    crypto_hash_sha256_state state_{};
-    std::int64_t size_bytes_ = 0;
-};
 
 std::string ReasonOf(archive* from) {
     const char* reason = ::archive_error_string(from);
@@ -95,7 +72,8 @@ FileDigest TarWriter::AddFile(const std::string& name, const std::filesystem::pa
         throw std::system_error(EINVAL, std::generic_category(), path.string() + " is no regular file");
     }
     BeginEntry(name, about.st_size);
-    Sha256 hash;
+    base::Sha256 hash;
+    std::int64_t size_bytes = 0;
     std::vector<char> block(kBlockBytes);
     for (std::size_t count = block.size(); count == block.size();) {
         const std::optional<std::size_t> read = base::ReadAll(file.Get(), block.data(), block.size());
@@ -105,8 +83,9 @@ FileDigest TarWriter::AddFile(const std::string& name, const std::filesystem::pa
         count = *read;
         Write(block.data(), count);
         hash.Add(block.data(), count);
+        size_bytes += static_cast<std::int64_t>(count);
     }
-    return hash.Finish();
+    return {size_bytes, hash.Finish()};
 }
 
 void TarWriter::AddText(const std::string& name, std::string_view text) {
@@ -149,7 +128,7 @@ std::optional<std::string> TarReader::Next() {
 
 FileDigest TarReader::CopyTo(const std::filesystem::path& path, std::uintmax_t max_bytes) {
     const base::FileDescriptor file = base::OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, kPrivate);
-    Sha256 hash;
+    base::Sha256 hash;
     std::uintmax_t bytes = 0;
     std::vector<char> block(kBlockBytes);
     for (;;) {
@@ -158,7 +137,7 @@ FileDigest TarReader::CopyTo(const std::filesystem::path& path, std::uintmax_t m
             throw Malformed("the backup is damaged: " + ReasonOf(archive_.get()));
         }
         if (count == 0) {
-            return hash.Finish();
+            return {static_cast<std::int64_t>(bytes), hash.Finish()};
         }
         bytes += static_cast<std::uintmax_t>(count);
         if (bytes > max_bytes) {
