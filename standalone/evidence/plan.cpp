@@ -74,7 +74,7 @@ std::vector<Part> PartsOf(const CameraFootage& camera, const TimeSpan& span, con
     return parts;
 }
 
-std::vector<File> FilesOf(const CameraFootage& camera, std::vector<Part> parts) {
+std::vector<File> FilesOf(const CameraFootage& camera, std::vector<Part>&& parts) {
     std::vector<File> files;
     std::string format;
     for (auto& [part, next] : parts) {
