@@ -192,8 +192,8 @@ constexpr const char* kSessionAddresses[] = {
 
 // Why events are kept; "archived" in their rows says that they are.
 constexpr const char* kKeptEvents[] = {
-    "create table kept_events (event_id integer not null primary key references events (id) on delete cascade,"
-    " note text not null, keeper text not null, kept_s bigint not null)",
+    ("create table kept_events (event_id integer not null primary key references events (id) on delete cascade,"
+     " note text not null, keeper text not null, kept_s bigint not null)"),
     "insert into kept_events (event_id, note, keeper, kept_s) select id, '', '', 0 from events where archived = 1",
     "create index events_kept on events (camera_id, start_s) where archived = 1",
 };
