@@ -73,6 +73,9 @@ await visit(async (page, complaints) => {
   await report("two back", await shown());
 
   await timeAt(x + Math.min(3 / scale, box.width - x - 20));
+  // Until then the picture from before may still be playing, which a pause would keep.
+  await page.waitForFunction(
+    (from) => Number(/^frame (\d+) /.exec(document.querySelector(".transport-frame").textContent)?.[1]) > from + 40, before.told);
   await page.keyboard.press(" ");
   await settled("paused");
   await report("jumped", await shown());
