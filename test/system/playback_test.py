@@ -160,7 +160,8 @@ class PlaybackTest(unittest.TestCase):
             self.assertTrue(visit.see("stands still")["same"])
             self.assertEqual(see("one on")["told"], found["told"] + 1)
             self.assertEqual(see("two back")["told"], found["told"] - 1)
-            self.assertGreater(see("jumped")["told"], found["told"])
+            jumped = see("jumped")
+            self.assertLess(abs(jumped["told"] - found["told"] - jumped["by"] * 25), 25)
             for kind, (mark, recording) in marks.items():
                 opened = see(kind, recording, is_number_told=False)
                 self.assertGreater(opened["told"], 0)
