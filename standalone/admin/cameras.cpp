@@ -25,10 +25,6 @@ constexpr std::size_t kMaxCameras = 1'000;
 constexpr std::chrono::milliseconds kMaxWaitForRecorder{5'000};
 constexpr std::chrono::milliseconds kPoll{100};
 
-const char* CodecText(base::Codec codec) {
-    return codec == base::Codec::kMjpeg ? "mjpeg" : codec == base::Codec::kH264 ? "h264" : "h265";
-}
-
 Json::Value PlanJson(const std::optional<RecordingPlan>& stored) {
     RecordingPlan plan;
     plan.pre_s = 0;
@@ -103,6 +99,10 @@ bool HasOpenEvent(store::Store& store, int camera) {
 
 }  // namespace
 
+const char* CodecWord(base::Codec codec) {
+    return codec == base::Codec::kMjpeg ? "mjpeg" : codec == base::Codec::kH264 ? "h264" : "h265";
+}
+
 void RequireSource(const media::SourceKinds& kinds, const std::string& source) {
     if (media::FindKind(kinds, source) == nullptr || !store::IsSource(source)) {
         throw store::InvalidRecord("a source begins with " + media::ListKinds(kinds) +
@@ -161,7 +161,7 @@ Json::Value ToJson(const CameraSetup& setup) {
         json["group"].append(group);
     }
     json["revision"] = Json::Int64{RevisionOf(json)};
-    json["codec"] = CodecText(camera.video_type);
+    json["codec"] = CodecWord(camera.video_type);
     return json;
 }
 

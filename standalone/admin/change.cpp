@@ -2,6 +2,7 @@
 #include "standalone/admin/change.h"
 
 #include <charconv>
+#include <memory>
 
 #include "standalone/base/clock.h"
 #include "standalone/store/audit_log.h"
@@ -61,6 +62,13 @@ std::string ToText(const Json::Value& value) {
     Json::StreamWriterBuilder writer;
     writer["indentation"] = "";
     return Json::writeString(writer, value);
+}
+
+Json::Value FromText(const std::string& text) {
+    Json::Value value;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
+    return value;
 }
 
 }  // namespace lookhaven::admin

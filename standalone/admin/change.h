@@ -62,5 +62,7 @@ void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen)
 
 // JSON in one line; the same text for equal records.
 std::string ToText(const Json::Value& value);
+// Null for an empty text.
+Json::Value FromText(const std::string& text);
 
 }  // namespace lookhaven::admin

@@ -12,6 +12,7 @@
 #include "standalone/api/camera_page.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/probe.h"
+#include "standalone/api/revision.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
 
@@ -76,36 +77,25 @@ Json::Value Completed(const Call& call, Json::Value record) {
     return record;
 }
 
+auto Completer(const Call& call) {
+    return [&call](const Json::Value& record) { return Completed(call, record); };
+}
+
 std::string CameraAnswer(const Call& call, const admin::CameraSetup& setup) {
     Json::Value data;
     data["camera"] = Completed(call, admin::ToJson(setup));
     return SuccessAnswer(data);
 }
 
-std::int64_t RequireNumber(const Call& call, const char* name) {
-    const Json::Value& value = call.Parameter(name);
-    if (!value.isInt64()) {
-        throw Failure(400, std::string(name) + " must be a number");
-    }
-    return value.asInt64();
-}
-
 int RequireId(const Call& call) {
-    const std::int64_t id = RequireNumber(call, "id");
-    if (!std::in_range<int>(id)) {
+    const Json::Value& id = call.Parameter("id");
+    if (!id.isInt64()) {
+        throw Failure(400, "id must be a number");
+    }
+    if (!id.isInt()) {
         throw Failure(404, kNoSuchCamera);
     }
-    return static_cast<int>(id);
-}
-
-// Calls change; a page that saw an older revision is told the record as List would.
-template <typename Change>
-auto OrStale(const Call& call, Change&& change) {
-    try {
-        return change();
-    } catch (const admin::Stale& stale) {
-        throw Failure(409, stale.what(), 0, admin::ToText(Completed(call, stale.Record())));
-    }
+    return id.asInt();
 }
 
 std::string Add(const Call& call) {
@@ -119,10 +109,11 @@ std::string Add(const Call& call) {
 
 std::string Set(const Call& call) {
     RequireNoSecretInQuery(call);
-    return OrStale(call, [&] {
-        return CameraAnswer(call, admin::SetCamera(call.Records(), call.Actor(), camera::NetworkKinds(),
-                                                   RequireId(call), RequireNumber(call, "revision"),
-                                                   [&](admin::CameraSetup& setup) { TakeCameraFields(call, setup); }));
+    const std::int64_t seen = SeenRevision(call);
+    return OnCurrentRecord(Completer(call), [&] {
+        return CameraAnswer(call,
+                            admin::SetCamera(call.Records(), call.Actor(), camera::NetworkKinds(), RequireId(call),
+                                             seen, [&](admin::CameraSetup& setup) { TakeCameraFields(call, setup); }));
     });
 }
 
@@ -131,8 +122,9 @@ std::string Remove(const Call& call) {
     if (footage != "keep" && footage != "remove") {
         throw Failure(400, "footage must be keep or remove");
     }
-    return OrStale(call, [&] {
-        admin::RemoveCamera(call.Records(), call.Actor(), RequireId(call), RequireNumber(call, "revision"),
+    const std::int64_t seen = SeenRevision(call);
+    return OnCurrentRecord(Completer(call), [&] {
+        admin::RemoveCamera(call.Records(), call.Actor(), RequireId(call), seen,
                             footage == "keep" ? admin::Footage::kKeep : admin::Footage::kRemove);
         return SuccessAnswer(Json::objectValue);
     });

@@ -56,8 +56,9 @@ void TakeNamed(const Json::Value& value, const std::string& name, const std::map
     target = found->second;
 }
 
-const std::map<std::string, base::Codec> kCodecs = {
-    {"mjpeg", base::Codec::kMjpeg}, {"h264", base::Codec::kH264}, {"h265", base::Codec::kH265}};
+const std::map<std::string, base::Codec> kCodecs = {{admin::CodecWord(base::Codec::kMjpeg), base::Codec::kMjpeg},
+                                                    {admin::CodecWord(base::Codec::kH264), base::Codec::kH264},
+                                                    {admin::CodecWord(base::Codec::kH265), base::Codec::kH265}};
 const std::map<std::string, store::RecordMode> kModes = {{"always", store::RecordMode::kAlways},
                                                          {"never", store::RecordMode::kNever},
                                                          {"schedule", store::RecordMode::kSchedule}};

@@ -16,6 +16,7 @@
 #include "standalone/admin/mount_place.h"
 #include "standalone/admin/mounts.h"
 #include "standalone/api/own_apis.h"
+#include "standalone/api/revision.h"
 #include "standalone/archive/layout.h"
 #include "standalone/base/clock.h"
 #include "standalone/control/common_config.h"
@@ -177,22 +178,12 @@ std::string AnswerRecord(const Call& call, const store::Mount& mount) {
     return SuccessAnswer(data);
 }
 
-// The result of change. Where it was made on a stale record, the current one is told as List tells it.
-template <typename Make>
-auto OnCurrent(const Call& call, Make&& change) {
-    try {
-        return change();
-    } catch (const admin::Stale& stale) {
-        const auto mount = store::Mounts(call.Records()).Find(stale.Record()["id"].asInt());
-        throw mount ? admin::Stale(Describe(call.Records(), *mount, SurroundingsOf(call))) : stale;
-    }
-}
-
-std::int64_t RevisionOf(const Call& call) {
-    if (call.Parameter("revision").isNull()) {
-        throw Failure(400, "revision is missing: send the one that List told");
-    }
-    return call.Parameter("revision").asInt64();
+// What List returns of the mount of a record, which somebody may have removed by now.
+auto Completer(const Call& call) {
+    return [&call](const Json::Value& record) {
+        const auto mount = store::Mounts(call.Records()).Find(record["id"].asInt());
+        return mount ? Describe(call.Records(), *mount, SurroundingsOf(call)) : record;
+    };
 }
 
 // Of a number above 0, in units; null is no limit, and one that is missing stays.
@@ -251,10 +242,10 @@ std::string Add(const Call& call) {
 }
 
 std::string Set(const Call& call) {
-    const std::int64_t seen = RevisionOf(call);
+    const std::int64_t seen = SeenRevision(call);
     const admin::MountChange change = ChangeOf(call);
     try {
-        return AnswerRecord(call, OnCurrent(call, [&] {
+        return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
                                 return admin::SetMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen,
                                                        change);
                             }));
@@ -268,9 +259,10 @@ std::string Set(const Call& call) {
 }
 
 std::string Remove(const Call& call) {
-    const std::int64_t seen = RevisionOf(call);
-    OnCurrent(call,
-              [&] { admin::RemoveMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen, false); });
+    const std::int64_t seen = SeenRevision(call);
+    OnCurrentRecord(Completer(call), [&] {
+        admin::RemoveMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen, false);
+    });
     return SuccessAnswer(Json::objectValue);
 }
 

@@ -2,14 +2,13 @@
 #include "standalone/api/probe.h"
 
 #include <algorithm>
-#include <cctype>
-
-#include <sodium.h>
 
 #include "standalone/admin/camera_stream.h"
+#include "standalone/admin/cameras.h"
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/still_picture.h"
+#include "standalone/base/text.h"
 #include "standalone/camera/isolated_source.h"
 
 namespace lookhaven::api {
@@ -21,30 +20,20 @@ constexpr int kPictureWidth = 640;
 // Of each step: to connect, to the first picture, to the next. Well within the host's limit of a request.
 constexpr std::chrono::seconds kMaxWait{6};
 
-std::string Base64(const std::vector<std::uint8_t>& bytes) {
-    std::string text(sodium_base64_ENCODED_LEN(bytes.size(), sodium_base64_VARIANT_ORIGINAL), '\0');
-    sodium_bin2base64(text.data(), text.size(), bytes.data(), bytes.size(), sodium_base64_VARIANT_ORIGINAL);
-    text.pop_back();  // the zero behind it
-    return text;
-}
-
 media::ProbeResult ProbeIsolated(const std::string& source, media::SourceOptions options) {
     options.no_data_limit = kMaxWait;
     return media::Probe(*camera::OpenIsolated(source, options, {}));
 }
 
-std::string LowerCase(std::string text) {
-    std::ranges::transform(text, text.begin(), [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
-    return text;
-}
-
 // Empty where it cannot be decoded: the codec and the size are known all the same.
 std::string PictureOf(const Call& call, media::ProbeResult& found) {
+    if (found.key_frame.empty()) {
+        return "";
+    }
     try {
-        return found.key_frame.empty()
-                   ? ""
-                   : Base64(SmallJpeg(call, base::CodecName(found.video.codec), std::move(found.key_frame),
-                                      found.video.width, kPictureWidth));
+        const std::vector<std::uint8_t> jpeg = SmallJpeg(call, base::CodecName(found.video.codec),
+                                                         std::move(found.key_frame), found.video.width, kPictureWidth);
+        return base::ToBase64({reinterpret_cast<const char*>(jpeg.data()), jpeg.size()});
     } catch (const Failure&) {
         return "";
     }
@@ -52,7 +41,7 @@ std::string PictureOf(const Call& call, media::ProbeResult& found) {
 
 Json::Value Describe(const Call& call, media::ProbeResult found) {
     Json::Value data;
-    data["codec"] = LowerCase(base::CodecName(found.video.codec));
+    data["codec"] = admin::CodecWord(found.video.codec);
     data["width"] = found.video.width;
     data["height"] = found.video.height;
     data["rate"] = found.frames_per_second;

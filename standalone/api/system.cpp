@@ -11,6 +11,7 @@
 
 #include <json/json.h>
 
+#include "standalone/admin/change.h"
 #include "standalone/api/health.h"
 #include "standalone/api/metrics.h"
 #include "standalone/api/own_apis.h"
@@ -90,10 +91,8 @@ std::string Health(const Call& call) {
         }
         json["message"] = problem.message;
     }
-    Json::StreamWriterBuilder writer;
-    writer["indentation"] = "";
     call.slot.status = problems.empty() ? 200 : 503;
-    return http::JsonAnswer(call.slot.status, Json::writeString(writer, answer) + '\n');
+    return http::JsonAnswer(call.slot.status, admin::ToText(answer) + '\n');
 }
 
 std::string Metrics(const Call& call) {
@@ -101,13 +100,6 @@ std::string Metrics(const Call& call) {
     return "Status: 200 OK\r\nContent-Type: text/plain; version=0.0.4; charset=utf-8\r\nCache-Control: no-store\r\n"
            "Content-Length: " +
            std::to_string(text.size()) + "\r\n\r\n" + text;
-}
-
-Json::Value FromText(const std::string& text) {
-    Json::Value value;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
-    return value;  // null for no text
 }
 
 std::string Audit(const Call& call) {
@@ -130,8 +122,8 @@ std::string Audit(const Call& call) {
         json["address"] = entry.address;
         json["action"] = entry.action;
         json["object"] = entry.object;
-        json["before"] = FromText(entry.before);
-        json["after"] = FromText(entry.after);
+        json["before"] = admin::FromText(entry.before);
+        json["after"] = admin::FromText(entry.after);
     }
     return SuccessAnswer(data);
 }

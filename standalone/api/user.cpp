@@ -11,6 +11,7 @@
 #include "standalone/admin/users.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/password_check.h"
+#include "standalone/api/revision.h"
 #include "standalone/base/clock.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/devices.h"
@@ -26,13 +27,6 @@ namespace {
 
 int IdOf(const Call& call) {
     return call.Parameter("id").asInt();
-}
-
-std::int64_t RevisionOf(const Call& call) {
-    if (call.Parameter("revision").isNull()) {
-        throw Failure(400, "revision is missing: send the one that List told");
-    }
-    return call.Parameter("revision").asInt64();
 }
 
 // With how it is used, which is no part of what its revision stands for.
@@ -53,14 +47,8 @@ std::string AnswerRecord(const Call& call, const Json::Value& record) {
     return SuccessAnswer(data);
 }
 
-// The result of change. Where it was made on a stale record, the current one is told as List tells it.
-template <typename Make>
-auto OnCurrent(const Call& call, Make&& change) {
-    try {
-        return change();
-    } catch (const admin::Stale& stale) {
-        throw admin::Stale(WithUse(stale.Record(), Uses(call)));
-    }
+auto Completer(const Call& call) {
+    return [&call](const Json::Value& record) { return WithUse(record, Uses(call)); };
 }
 
 // What is read of each record beside its id and name, too.
@@ -144,7 +132,7 @@ std::string Add(const Call& call) {
 
 std::string Set(const Call& call) {
     RequireNoSecretInQuery(call);
-    const std::int64_t seen = RevisionOf(call);
+    const std::int64_t seen = SeenRevision(call);
     admin::UserChange change = RightsOf(call);
     std::optional<std::string> password;
     if (!call.Parameter("password").isNull()) {
@@ -156,15 +144,16 @@ std::string Set(const Call& call) {
     if (password) {
         change.password = Hash(call, *password);
     }
-    return AnswerRecord(
-        call, OnCurrent(call, [&] { return admin::SetUser(call.Records(), call.Actor(), IdOf(call), seen, change); }));
+    return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
+                            return admin::SetUser(call.Records(), call.Actor(), IdOf(call), seen, change);
+                        }));
 }
 
 std::string Remove(const Call& call) {
     RequireNoSecretInQuery(call);
-    const std::int64_t seen = RevisionOf(call);
+    const std::int64_t seen = SeenRevision(call);
     Reauthenticate(call, "reauth");
-    OnCurrent(call, [&] { admin::RemoveUser(call.Records(), call.Actor(), IdOf(call), seen); });
+    OnCurrentRecord(Completer(call), [&] { admin::RemoveUser(call.Records(), call.Actor(), IdOf(call), seen); });
     return SuccessAnswer(Json::objectValue);
 }
 

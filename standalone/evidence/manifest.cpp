@@ -6,9 +6,8 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include <unistd.h>
-
 #include "standalone/base/clock.h"
+#include "standalone/base/host_name.h"
 #include "standalone/base/sha256.h"
 
 namespace lookhaven::evidence {
@@ -45,18 +44,13 @@ Json::Value SpansJson(const Plan& plan, const std::vector<archive::TimeSpan>& sp
     return json;
 }
 
-std::string HostName() {
-    std::array<char, 256> name{};
-    return ::gethostname(name.data(), name.size() - 1) == 0 ? name.data() : "";
-}
-
 // Without what fills it up.
 std::string TextOf(const Plan& plan, std::span<const WrittenFile> written) {
     Json::Value json;
     json["format"] = kManifestFormat;
     json["exported"] = MomentOf(plan, plan.request.now_ms);
     json["exported"]["by"] = plan.request.exporter;
-    json["exported"]["host"] = HostName();
+    json["exported"]["host"] = base::OwnHostName();
     json["begin"] = MomentOf(plan, plan.request.span.begin_ms);
     json["end"] = MomentOf(plan, plan.request.span.end_ms);
     json["camera"] = CamerasOf(plan);
