@@ -18,8 +18,8 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kTryAgainUs = 1'000'000;
-// Until the recorder knows of a mark: it looks once a second, and the store may be slow.
-constexpr int kMaxNoticeSeconds = 2;
+// Until the recorder knows of a mark, or has a number for the event: it asks the store once a second, which may be slow.
+constexpr int kMaxWaitSeconds = 2;
 // Events that begin for a camera's times alone: so many at once, and then one in each interval.
 constexpr std::int64_t kCutsAtOnce = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
@@ -52,8 +52,8 @@ void CameraRecorder::Take(Frame frame) {
         Guard([&] { Write(frame); });
         last_flush_us_ = context_.monotonic_us();
     } else {
-        const int pre_s = request_.plan.pre_s;
-        pre_record_.Add(std::move(frame), pre_s > 0 ? pre_s + kMaxNoticeSeconds : 0);
+        const bool is_needed = request_.plan.pre_s > 0 || IsWanted();
+        pre_record_.Add(std::move(frame), is_needed ? request_.plan.pre_s + kMaxWaitSeconds : 0);
         Begin();
     }
     interval_us_ = interval_us;
