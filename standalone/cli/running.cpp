@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/cli/running.h"
 
+#include <chrono>
 #include <cstring>
 #include <string>
+#include <thread>
 
 #include <poll.h>
 #include <sys/socket.h>
@@ -11,12 +13,15 @@
 #include "standalone/base/file_descriptor.h"
 #include "standalone/cli/console.h"
 #include "standalone/control/common_config.h"
+#include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::cli {
 
 namespace {
 
 constexpr int kSocketTimeoutMs = 3000;
+// A recorder renews its lease every five seconds.
+constexpr std::chrono::seconds kLeaseWait{6};
 
 }  // namespace
 
@@ -50,6 +55,18 @@ void RequireStopped(const base::Installation& installation) {
     if (control::FindRecorder(installation) != control::RecorderState::kNone || HostAnswers(installation)) {
         throw Failure(kUnavailable, "Lookhaven is running for ", installation.Home().string(),
                       ": stop it first (installed services: as root, systemctl stop lookhaven.target)");
+    }
+}
+
+void RequireNoOtherRecorder(const base::Installation& installation, store::Store& store) {
+    store::RecorderLease lease(store);
+    const store::LeaseState before = lease.Current();
+    if (before.holder.empty() || before.holder == store::RecorderName(installation)) {
+        return;
+    }
+    std::this_thread::sleep_for(kLeaseWait);
+    if (lease.Current().count != before.count) {
+        throw Failure(kUnavailable, "the recorder of ", before.holder, " records into this store: stop it first");
     }
 }
 

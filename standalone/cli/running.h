@@ -4,6 +4,7 @@
 #pragma once
 
 #include "standalone/base/installation.h"
+#include "standalone/store/store.h"
 
 namespace lookhaven::cli {
 
@@ -12,5 +13,9 @@ bool HostAnswers(const base::Installation& installation);
 
 // For what nobody may use meanwhile. Throws Failure, which says how to stop them, when the host or the recorder runs.
 void RequireStopped(const base::Installation& installation);
+
+// For a store that several hosts may share. Throws Failure while the recorder of another one records into it; where one
+// once did, it takes six seconds to find out.
+void RequireNoOtherRecorder(const base::Installation& installation, store::Store& store);
 
 }  // namespace lookhaven::cli

@@ -47,6 +47,7 @@ void Move(const Console& console, const Request& request) {
     const base::Installation installation = console.Installation();
     store::Store source = console.OpenStore();
     RequireStopped(installation);
+    RequireNoOtherRecorder(installation, source);
     if (url == installation.StoreUrl()) {
         throw Failure(kDataError, "the records are there already");
     }

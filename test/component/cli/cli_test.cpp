@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The operator's command line: what each line answers, how it fails, and that no password ever shows.
+#include <chrono>
 #include <fstream>
+#include <thread>
 #include <tuple>
 
 #include <sys/stat.h>
@@ -10,6 +12,7 @@
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
 #include "standalone/store/cameras.h"
+#include "standalone/store/recorder_lease.h"
 #include "standalone/store/users.h"
 #include "test/component/cli/program.h"
 #include "test/support/postgres/temporary_postgres.h"
@@ -268,6 +271,18 @@ TEST_F(CliTest, AnInstallationMayKeepItsStoreInPostgresql) {
           {"restore /dev/null", 65, "no backup"},
           {"store move sqlite:moved.db", 65, "absolute"}});
     EXPECT_FALSE(std::filesystem::exists(home_ / "lookhaven.db"));
+    {
+        store::Store store = store::Store::Open(base::Installation(home_).StoreUrl());
+        store::RecorderLease lease(store);
+        lease.Take(lease.Current().count, "another host", 7);
+        const std::jthread other([&](const std::stop_token& stop) {
+            while (!stop.stop_requested()) {
+                std::this_thread::sleep_for(std::chrono::seconds(1));
+                lease.Take(lease.Current().count, "another host", 7);
+            }
+        });
+        Play({{"store move " + moved, 69, "another host"}});
+    }
     Play({{"store move -", 0, "Moved", "", moved + "\n"},
           {"store move " + moved, 65, "already"},
           {"store show", 0, "moved.db"},
