@@ -19,6 +19,17 @@ function cut(): (string | null)[] {
     .map((one) => one.ariaLabel ?? one.className);
 }
 
+/** Which frame is shown, once neither it nor the address has changed for two seconds: a step's picture comes later. */
+async function settledFrame(page: Page): Promise<string> {
+  const told = () => page.evaluate(() => `${document.querySelector(".transport-frame")!.textContent} at ${location.hash}`);
+  for (let last = ""; ;) {
+    const now = await told();
+    if (now === last) return now.split(" at ")[0]!;
+    last = now;
+    await page.waitForTimeout(2_000);
+  }
+}
+
 describe.skipIf(!hasBrowser)("in Chromium", () => {
   const client = new ServedClient();
   const { server } = client;
@@ -91,7 +102,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.waitForSelector(".day.playing");
     expect(await page.isDisabled("[aria-label='Next month']"), "beyond today").toBe(true);
     await page.waitForURL(/#event=2&at=\d+$/);
-    const frame = (await page.textContent(".transport-frame"))!;
+    const frame = await settledFrame(page);
     await page.reload();
     await page.locator(".transport-frame", { hasText: frame }).waitFor();
     await playing(page, false);
