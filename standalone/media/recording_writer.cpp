@@ -2,9 +2,11 @@
 #include "standalone/media/recording_writer.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <utility>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
@@ -131,24 +133,47 @@ void RecordingWriter::Close() {
         return;
     }
     if (!has_failed_ && output_ != nullptr) {
-        Flush();
-        try {
-            output_->End();
-            Sync();
-            end_bytes_ = static_cast<std::uint64_t>(::lseek(file_.Get(), 0, SEEK_END));
-        } catch (const std::exception& error) {
-            base::LogWarning(path_ + " ends without a seek table: " + error.what());
-            has_failed_ = true;
-        }
-        output_.reset();  // it cannot be ended twice
+        End();
     }
     OnDisk([&] {
+        if (frame_count_ == 0) {
+            Remove();
+            return;
+        }
         if (has_failed_ && ::ftruncate(file_.Get(), static_cast<off_t>(end_bytes_)) != 0) {
             base::ThrowErrno("cannot truncate " + path_);
         }
         index_->Finish();
     });
     is_finished_ = true;
+}
+
+void RecordingWriter::End() {
+    try {
+        Flush();
+    } catch (const WriteError& error) {
+        base::LogWarning(path_ + " ends early: " + error.what());
+        return;
+    }
+    try {
+        output_->End();
+        Sync();
+        end_bytes_ = static_cast<std::uint64_t>(::lseek(file_.Get(), 0, SEEK_END));
+    } catch (const std::exception& error) {
+        base::LogWarning(path_ + " ends without a seek table: " + error.what());
+        has_failed_ = true;
+    }
+    output_.reset();  // it cannot be ended twice
+}
+
+// The path leads elsewhere while the disk is away, so the file itself is asked whether it is gone.
+void RecordingWriter::Remove() const {
+    archive::RemoveFile(archive::IndexPathOf(path_));
+    archive::RemoveFile(path_);
+    struct stat status {};
+    if (::fstat(file_.Get(), &status) != 0 || status.st_nlink > 0) {
+        throw std::system_error(EIO, std::generic_category(), "cannot remove " + path_ + ", which has no frame");
+    }
 }
 
 template <class Step>

@@ -56,9 +56,10 @@ class RecordingWriter {
     // viewer who wants the newest frames, and when no packet comes. Throws as Write.
     void Flush();
 
-    // Flushes, writes what makes the file seekable for other programs, and marks the index finished. After a WriteError
-    // it cuts off what is not whole and marks the index finished. Throws WriteError when that fails; it may be called
-    // again then, as it may after it succeeded.
+    // Flushes, writes what makes the file seekable for other programs, and marks the index finished. What the disk does
+    // not take now, or did not take before, is cut off, with a warning in the log; a recording without a frame is
+    // removed. Throws WriteError when the file cannot even be finished so; call it again later then. Also allowed after
+    // it succeeded.
     void Close();
 
     // Of what was flushed.
@@ -71,6 +72,8 @@ class RecordingWriter {
     void Create(const std::filesystem::path& path, int reason);
     template <class Step>
     void WriteOrFail(Step step);
+    void End();
+    void Remove() const;
     void Sync() const;
     void AppendToIndex();
 

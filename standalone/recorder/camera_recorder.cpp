@@ -24,6 +24,10 @@ constexpr int kMaxWaitSeconds = 2;
 constexpr std::int64_t kCutsAtOnce = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
+// Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk that
+// stays broken could not be unmounted; recovery finishes what is left.
+constexpr std::int64_t kFinishForUs = 60'000'000;
+constexpr std::size_t kMaxUnfinished = 4;
 // Split here even where no key frame comes or the next event has no number.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
 
@@ -83,9 +87,27 @@ void CameraRecorder::Tick() {
         next_mount_check_us_ = now_us + kMountCheckUs;
         CheckMount();
     }
+    FinishLeft();
     if (!event_) {
         Begin();
     }
+}
+
+// A disk that was full, away or read-only for a moment must not leave files that look as if a crash had.
+void CameraRecorder::FinishLeft() {
+    const std::int64_t now_us = context_.monotonic_us();
+    if (unfinished_.empty() || now_us < finish_again_us_) {
+        return;
+    }
+    finish_again_us_ = now_us + kTryAgainUs;
+    std::erase_if(unfinished_, [&](const Unfinished& left) {
+        try {
+            left.event->Close();
+            return true;
+        } catch (const std::exception&) {
+            return now_us >= left.give_up_us;
+        }
+    });
 }
 
 bool CameraRecorder::Flush(int event) {
@@ -173,7 +195,7 @@ void CameraRecorder::Begin() {
         if (!start) {
             return;
         }
-        event_.emplace(*start, *pre_record_.First().format, context_.rows);
+        event_ = std::make_unique<EventWriter>(*start, *pre_record_.First().format, context_.rows);
         newest_us_ = start->timestamp_us;
         has_gap_ = false;
         if (state_ != RecordingState::kReady) {
@@ -240,7 +262,11 @@ void CameraRecorder::Pause(RecordingState state, const std::string& reason) {
         try {
             event_->Close();
         } catch (const std::exception& failure) {
-            base::LogWarning(std::string("an event could not be finished: ") + failure.what());
+            base::LogWarning(std::string("an event could not be finished yet: ") + failure.what());
+            if (unfinished_.size() == kMaxUnfinished) {
+                unfinished_.erase(unfinished_.begin());
+            }
+            unfinished_.push_back({std::move(event_), context_.monotonic_us() + kFinishForUs});
         }
         event_.reset();
     }

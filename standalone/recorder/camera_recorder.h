@@ -14,8 +14,10 @@
 #include <cstdint>
 #include <functional>
 #include <limits>
+#include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/recorder/catalog.h"
@@ -62,6 +64,12 @@ class CameraRecorder {
     int OpenEvent() const { return event_ ? event_->Start().id : 0; }
 
   private:
+    // An event that the disk did not let finish.
+    struct Unfinished {
+        std::unique_ptr<EventWriter> event;
+        std::int64_t give_up_us = 0;
+    };
+
     std::int64_t WallS() const { return context_.wall_ms() / 1000; }
     std::int64_t WallOf(std::int64_t timestamp_us) const;
     bool IsWanted() const;
@@ -78,12 +86,14 @@ class CameraRecorder {
     template <class Work>
     bool Guard(Work&& work);
     void Pause(maintenance::RecordingState state, const std::string& reason);
+    void FinishLeft();
 
     const int camera_;
     const RecorderContext context_;
     RecordingRequest request_;
     PreRecordBuffer pre_record_;  // used while no event is open
-    std::optional<EventWriter> event_;
+    std::unique_ptr<EventWriter> event_;
+    std::vector<Unfinished> unfinished_;  // oldest first
     maintenance::RecordingState state_ = maintenance::RecordingState::kReady;
     std::int64_t last_picture_us_ = 0;
     std::int64_t newest_us_ = 0;    // capture time of the newest picture of the open event
@@ -94,6 +104,7 @@ class CameraRecorder {
     std::int64_t last_flush_us_ = 0;
     std::int64_t next_mount_check_us_ = 0;
     std::int64_t try_again_us_ = 0;
+    std::int64_t finish_again_us_ = 0;
 };
 
 }  // namespace lookhaven::recorder

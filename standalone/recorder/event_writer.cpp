@@ -112,9 +112,9 @@ void EventWriter::NoteProgress() {
 void EventWriter::Log(std::int64_t begin_s, std::int64_t end_s) {
     begin_s = std::max(begin_s, logged_until_s_);
     if (begin_s < end_s) {
-        logged_until_s_ = end_s;
         archive::WriteRecordingLog(start_.mount / std::to_string(start_.camera), begin_s, end_s,
                                    static_cast<std::uint8_t>(start_.reason));
+        logged_until_s_ = end_s;
     }
 }
 

@@ -40,8 +40,8 @@ class EventWriter {
     void Write(const Frame& frame, bool after_gap = false);
     void Flush();
     // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
-    // when the file cannot be finished; then the row describes what was flushed, and recovery or verify finishes the
-    // file.
+    // when the file cannot be finished; then the row describes what was flushed, and Close may be tried again later.
+    // Recovery or verify finishes what is left so.
     void Close();
 
   private:

@@ -186,6 +186,33 @@ TEST(RecordingWriter, AFullDiskLeavesWhatWasFlushed) {
         EXPECT_FALSE(archive::RecordingReader(path).Grows());
         EXPECT_EQ(Probe(path), "mjpeg," + std::to_string(writer.FrameCount()) + "\n");
     }
+    // The disk is full when the file is ended, first with frames on it, then without any, and for a while away besides.
+    for (const int flushed : {20, 0}) {
+        const std::filesystem::path path = folder / "day/a.mkv";
+        std::filesystem::create_directory(folder / "day");
+        RecordingWriter writer(path, clip.format, 0, 1);
+        for (int i = 0; i < flushed; ++i) {
+            writer.Write(clip.At(static_cast<std::size_t>(i)));
+        }
+        writer.Flush();
+        const struct rlimit small { std::filesystem::file_size(path) + 100, before.rlim_max };
+        ::setrlimit(RLIMIT_FSIZE, &small);
+        writer.Write(clip.At(static_cast<std::size_t>(flushed)));
+        std::filesystem::rename(folder / "day", folder / "away");
+        if (flushed == 0) {
+            EXPECT_THROW(writer.Close(), WriteError) << "a file that is not there cannot be removed";
+        }
+        std::filesystem::rename(folder / "away", folder / "day");
+        writer.Close();
+        ::setrlimit(RLIMIT_FSIZE, &before);
+        EXPECT_EQ(std::filesystem::exists(path), flushed > 0);
+        EXPECT_EQ(std::filesystem::exists(archive::IndexPathOf(path)), flushed > 0);
+        if (flushed > 0) {
+            EXPECT_EQ(archive::RecordingReader(path).FrameCount(), flushed);
+            EXPECT_FALSE(archive::RecordingReader(path).Grows());
+        }
+        std::filesystem::remove_all(folder / "day");
+    }
     std::signal(SIGXFSZ, old_handler);
     EXPECT_THROW(RecordingWriter(folder / "gone" / "a.mkv", clip.format, 0, 1), WriteError);
     EXPECT_FALSE(std::filesystem::exists(folder / "gone"));

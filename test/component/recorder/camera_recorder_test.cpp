@@ -98,6 +98,9 @@ TEST_F(CameraRecorderTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsE
     recorder_.Close();
     ASSERT_EQ(Files().size(), 2U);
     EXPECT_GE(archive::RecordingReader(Files().front()).FrameCount(), 60) << "it was on the disk";
+    std::array<std::uint8_t, 6> seconds{};
+    ASSERT_TRUE(archive::ReadRecordingLog(MountPath(1) / "7", (kNoonMs + 1'000'000) / 1000, seconds));
+    EXPECT_THAT(seconds, testing::Each(base::kReasonContinuous)) << "what the disk refused is written later";
     EXPECT_EQ(recorder_.State(), RecordingState::kReady);
 }
 
