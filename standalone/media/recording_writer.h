@@ -13,6 +13,7 @@
 #include <optional>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "standalone/archive/frame_index.h"
@@ -27,7 +28,13 @@ class ContainerOutput;
 // The recording cannot be written on: code() is ENOSPC or EDQUOT for a full disk, else what the disk reports.
 class WriteError : public std::system_error {
   public:
-    using std::system_error::system_error;
+    // why: the whole sentence, to which the code's own text would only add what it says already.
+    WriteError(std::error_code code, std::string why) : std::system_error(code), why_(std::move(why)) {}
+
+    const char* what() const noexcept override { return why_.c_str(); }
+
+  private:
+    std::string why_;
 };
 
 // Thread safety: one thread.
