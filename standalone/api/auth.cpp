@@ -1,12 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Auth: log in, log out, who am I.
+// VEXO.Auth: log in, log out, who am I; and the first account of all.
+#include <filesystem>
+#include <initializer_list>
+#include <system_error>
+
+#include "standalone/admin/first_account.h"
 #include "standalone/api/admit.h"
 #include "standalone/api/login_log.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/player.h"
-
 #include "standalone/base/clock.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/users.h"
@@ -29,26 +33,63 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
     return data;
 }
 
-std::string LogIn(const Call& call) {
+void RequireNotInQuery(const Call& call, std::initializer_list<const char*> names) {
     const Parameters query = ReadQuery(call.request);
-    if (query.contains("account") || query.contains("password")) {
-        throw Failure(400, "account and password belong in the body: URLs end up in logs and browser histories");
+    for (const char* name : names) {
+        if (query.contains(name)) {
+            throw Failure(400, std::string(name) + " belongs in the body: URLs end up in logs and browser histories");
+        }
     }
+}
+
+std::string LoggedIn(const Call& call, const store::User& user, const store::NewSession& session) {
+    LogAccepted(call.context.Installation(), user.name, call.request.Header("REMOTE_ADDR"));
+    return SuccessAnswer(Identity(call.Records(), user.name, user.id, user.IsManager()),
+                         CookieLine(call.request, session.secret));
+}
+
+std::string LogIn(const Call& call) {
+    RequireNotInQuery(call, {"account", "password"});
     const std::string account = call.Parameter("account").asString();
     const std::string_view address = call.request.Header("REMOTE_ADDR");
     store::Store& records = call.Records();
     try {
         const store::VerifiedUser user = CheckPassword(call, account, call.Parameter("password").asString());
-        const store::NewSession session = store::Sessions(records).Create(user, base::WallSeconds(), address);
-        LogAccepted(call.context.Installation(), user.name, address);
-        return SuccessAnswer(Identity(records, user.name, user.id, user.IsManager()),
-                             CookieLine(call.request, session.secret));
+        return LoggedIn(call, user, store::Sessions(records).Create(user, base::WallSeconds(), address));
     } catch (const Failure& failure) {
         LogRefused(call.context.Installation(), account, address, failure.what());
         throw;
     } catch (const store::NotFound&) {  // removed, or its password changed, in this moment
         LogRefused(call.context.Installation(), account, address, "the account has changed in this moment");
         throw Failure(401, "wrong account or password");
+    }
+}
+
+std::string MakeFirstAccount(const Call& call) {
+    RequireNotInQuery(call, {"account", "password", "token"});
+    const std::string name = call.Parameter("account").asString();
+    const std::string password = RequireNewPassword(call, "password");
+    const std::string token = call.Parameter("token").asString();
+    const std::string address(call.request.Header("REMOTE_ADDR"));
+    store::Store& records = call.Records();
+    const base::Installation& installation = call.context.Installation();
+    try {
+        CheckSetupToken(call, token);
+        const store::User user =
+            admin::AddFirstAccount(records, token, name, Hash(call, password), address, base::WallSeconds());
+        std::error_code ignored;  // what the file holds is of no use any more
+        std::filesystem::remove(admin::SetupAddressFile(installation), ignored);
+        return LoggedIn(call, user, store::Sessions(records).Create(user.id, base::WallSeconds(), address));
+    } catch (const Failure& failure) {
+        LogRefused(installation, name, address, failure.what());
+        throw;
+    } catch (const admin::InvalidToken& error) {
+        LogRefused(installation, name, address, error.what());
+        throw Failure(403, "This address has expired or was replaced by a newer one. On the server, the command"
+                           " lookhaven setup-address prints another.");
+    } catch (const store::AlreadyExists& error) {
+        LogRefused(installation, name, address, error.what());
+        throw Failure(409, "There is an account already. Please log in.");
     }
 }
 
@@ -60,6 +101,10 @@ const binding::Login& RequireLogin(const Call& call) {
 }
 
 std::string Status(const Call& call) {
+    if (!call.login && store::Users(call.Records()).IsEmpty()) {
+        throw Failure(401, "there is no account yet: lookhaven setup-address, on the server, prints where to make it",
+                      0, R"({"noAccount":true})");
+    }
     const binding::Login& login = RequireLogin(call);
     return SuccessAnswer(Identity(call.Records(), login.account, static_cast<int>(login.user_id), login.is_manager));
 }
@@ -72,8 +117,10 @@ std::string LogOut(const Call& call) {
     return SuccessAnswer(Json::nullValue, CookieLine(call.request, "; Max-Age=0") + "Clear-Site-Data: \"cache\"\r\n");
 }
 
-constexpr Method kMethods[] = {
-    {"Login", LogIn, Method::Effect::kChanges}, {"Logout", LogOut, Method::Effect::kChanges}, {"Status", Status}};
+constexpr Method kMethods[] = {{"Login", LogIn, Method::Effect::kChanges},
+                               {"Logout", LogOut, Method::Effect::kChanges},
+                               {"Status", Status},
+                               {"MakeFirstAccount", MakeFirstAccount, Method::Effect::kChanges}};
 
 }  // namespace
 

@@ -32,7 +32,7 @@ struct OwnApi {
     const Method& Find(int version, const std::string& method) const;
 };
 
-extern const OwnApi kAuthApi;      // log in, log out, who am I
+extern const OwnApi kAuthApi;      // log in, log out, who am I; the first account
 extern const OwnApi kCameraApi;    // cameras as a manager sets them up
 extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
 extern const OwnApi kEmapApi;      // what an editor of e-maps needs, and the states of doors and ports

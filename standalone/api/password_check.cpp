@@ -5,6 +5,7 @@
 
 #include <arpa/inet.h>
 
+#include "standalone/admin/first_account.h"
 #include "standalone/api/login_log.h"
 #include "standalone/base/clock.h"
 #include "standalone/store/login_throttle.h"
@@ -15,6 +16,9 @@ namespace {
 
 // Whoever is logged in can ask for hashes without end, with the right password, and must keep nobody from logging in.
 constexpr control::HashingLimits kHashingLimits{.in_all = 4, .of_users = 2, .of_user = 1};
+
+// Stands for an account where attempts are counted; no account's name has a space.
+constexpr const char* kSetup = "first account";
 
 // Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
 // All machines of a link share its link-local network.
@@ -76,6 +80,15 @@ store::VerifiedUser Reauthenticate(const Call& call, const std::string& paramete
         }
         throw;
     }
+}
+
+void CheckSetupToken(const Call& call, const std::string& token) {
+    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+    const std::int64_t now_s = base::WallSeconds();
+    store::LoginThrottle throttle(call.Records());
+    RefuseUnlessNow(throttle.Enter(kSetup, network, now_s));
+    admin::RequireSetupToken(call.Records(), token, now_s);
+    throttle.Clear(kSetup, network);
 }
 
 std::string RequireNewPassword(const Call& call, const std::string& parameter) {

@@ -31,6 +31,10 @@ store::VerifiedUser CheckPassword(const Call& call, const std::string& account, 
 // of a log-in. Throws Failure 403 for a wrong one, so that a client does not take its session for ended; 429 and 503.
 store::VerifiedUser Reauthenticate(const Call& call, const std::string& parameter);
 
+// Whether admin::AddFirstAccount would take the token. Hashes no password; attempts are limited by network, as log-ins
+// are. Throws admin::InvalidToken; store::AlreadyExists when there is an account; Failure 429.
+void CheckSetupToken(const Call& call, const std::string& token);
+
 // The new password of the parameter of that name, not hashed yet. To be asked before anything is hashed. Throws
 // store::InvalidRecord for what is no password; Json::Exception for what is no text.
 std::string RequireNewPassword(const Call& call, const std::string& parameter);

@@ -113,6 +113,9 @@ void Init(const Console& console, const Request& request) {
         text += admin_added ? "\nAdded account " + admin + "."
                             : "\nAccount " + admin + " exists already and was not changed.";
     }
+    if (store::Users(store).IsEmpty()) {
+        text += "\nThere is no account yet: lookhaven setup-address prints an address that makes one in a browser.";
+    }
     console.Answer(Object("home", home, "migrations", steps, "admin_added", admin_added, "mount_added", mount_added),
                    text);
 }

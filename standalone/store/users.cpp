@@ -194,6 +194,10 @@ std::vector<User> Users::List() {
     return connection_.FetchAll<User>("order by id");
 }
 
+bool Users::IsEmpty() {
+    return !connection_.FetchOne<int>("select id from users limit 1");
+}
+
 void Users::Lock() {
     connection_.Execute("update counters set value = value where name = 'user'");
 }

@@ -85,6 +85,8 @@ class Users {
     std::optional<User> Find(int id);
     std::optional<User> FindByName(std::string_view name);
     std::vector<User> List();  // by id
+    // Whether there is no account yet. Reads one row at most.
+    bool IsEmpty();
 
     // Inside of InTransaction: until its end, nobody else who calls this goes on.
     void Lock();

@@ -21,6 +21,7 @@ TABLE = """
                                                                       nobody ended viewer2 blind deaf mapless doorless marker manager host
 Auth.Status                                                           E      E     D       D     D    D       D        D      D       E
 Auth.Login                                                            M      M     M       M     M    M       M        M      M       M
+Auth.MakeFirstAccount                                                 M      M     M       M     M    M       M        M      M       M
 Auth.Logout                                                           M      M     M       M     M    M       M        M      M       M
 POST Camera.List                                                      E      E     F       F     F    F       F        F      D       E
 POST Camera.Probe address=rtsp://127.0.0.1:1/                         E      E     F       F     F    F       F        F      D       E

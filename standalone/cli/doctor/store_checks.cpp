@@ -43,7 +43,8 @@ Findings CheckStore(const base::Installation& installation) {
         }
         const std::vector<store::User> users = store::Users(store).List();
         if (std::ranges::none_of(users, [](const store::User& user) { return user.IsManager(); })) {
-            findings.push_back({"no account may manage this installation", "lookhaven init --admin NAME"});
+            findings.push_back({"no account may manage this installation",
+                                users.empty() ? "lookhaven setup-address" : "lookhaven init --admin NAME"});
         }
         return findings;
     } catch (const store::SchemaError& error) {

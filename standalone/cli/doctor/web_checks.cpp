@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
-#include <regex>
 
 #include <netdb.h>
 #include <sys/socket.h>
@@ -17,6 +16,7 @@
 #include "standalone/cli/doctor/checks.h"
 #include "standalone/cli/paired_host.h"
 #include "standalone/cli/units.h"
+#include "standalone/cli/web_listeners.h"
 #include "standalone/remote/certificate.h"
 
 namespace lookhaven::cli::doctor {
@@ -26,33 +26,7 @@ namespace {
 constexpr int kTimeoutMs = 3000;
 constexpr std::int64_t kNoticeSeconds = 30 * 86400;
 
-// An address that the web server is told to listen on.
-struct Listener {
-    std::string host;
-    std::string port;
-    bool has_tls = false;
-};
-
-// Who starts the web server puts it there; an installation behind another web server has none.
-std::filesystem::path ConfigurationOf(const base::Installation& installation) {
-    return installation.RunFolder() / "nginx.conf";
-}
-
-std::vector<Listener> ListenersOf(const base::Installation& installation) {
-    std::vector<Listener> listeners;
-    std::ifstream file(ConfigurationOf(installation));
-    static const std::regex kListen(R"(^\s*listen (?:(\[::\]|[0-9.]+):)?([0-9]+)( ssl)?.*)");
-    std::smatch match;
-    for (std::string line; std::getline(file, line);) {
-        if (std::regex_match(line, match, kListen)) {
-            const std::string host = match[1] == "[::]" ? "::1" : "127.0.0.1";
-            listeners.push_back({host, match[2], match[3].matched});
-        }
-    }
-    return listeners;
-}
-
-base::FileDescriptor Connect(const Listener& listener) {
+base::FileDescriptor Connect(const WebListener& listener) {
     addrinfo hints{};
     hints.ai_socktype = SOCK_STREAM;
     hints.ai_flags = AI_NUMERICHOST | AI_NUMERICSERV;
@@ -70,7 +44,7 @@ base::FileDescriptor Connect(const Listener& listener) {
 }
 
 // Of a TLS port, only that somebody listens.
-bool Answers(const Listener& listener) {
+bool Answers(const WebListener& listener) {
     constexpr std::string_view kRequest = "GET / HTTP/1.0\r\nHost: localhost\r\n\r\n";
     const base::FileDescriptor socket = Connect(listener);
     char byte = 0;
@@ -87,20 +61,20 @@ bool HasIpv6() {
 }  // namespace
 
 Findings CheckWebServer(const base::Installation& installation) {
-    const std::vector<Listener> listeners = ListenersOf(installation);
+    const std::vector<WebListener> listeners = WebListenersOf(installation);
     Findings findings;
     // The service's own configuration goes when it ends.
     if (std::error_code ignored;
-        listeners.empty() && std::filesystem::is_symlink(ConfigurationOf(installation), ignored)) {
+        listeners.empty() && std::filesystem::is_symlink(WebServerConfiguration(installation), ignored)) {
         findings.push_back({"the web server does not run", HowToStart(installation, installation.LogFolder())});
     }
-    for (const Listener& listener : listeners) {
+    for (const WebListener& listener : listeners) {
         if (!Answers(listener)) {
             findings.push_back({Concat("the web server does not answer at ", listener.host, " port ", listener.port),
                                 HowToStart(installation, installation.LogFolder() / "nginx.log")});
         }
     }
-    if (!listeners.empty() && HasIpv6() && std::ranges::find(listeners, "::1", &Listener::host) == listeners.end()) {
+    if (!listeners.empty() && HasIpv6() && std::ranges::find(listeners, "::1", &WebListener::host) == listeners.end()) {
         findings.push_back({"this machine has IPv6, where the web server does not listen",
                             "restart the server, which looks for IPv6 when it starts", Severity::kNote});
     }
@@ -111,7 +85,7 @@ Findings CheckCertificate(const base::Installation& installation) {
     const std::filesystem::path path = installation.TlsFolder() / "certificate.pem";
     std::error_code ignored;
     if (!std::filesystem::exists(path, ignored)) {
-        return ListenersOf(installation).empty()
+        return WebListenersOf(installation).empty()
                    ? Findings()
                    : Findings{{"there is no certificate at " + path.string(), "restart the server, which makes one"}};
     }

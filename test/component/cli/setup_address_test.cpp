@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// lookhaven setup-address: what it prints, whom it leaves it to, and that it stops once there is an account.
+#include <fstream>
+#include <regex>
+
+#include "standalone/admin/first_account.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/file.h"
+#include "standalone/base/host_name.h"
+#include "standalone/store/users.h"
+#include "test/component/cli/program.h"
+
+namespace lookhaven::cli {
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+class SetupAddress : public CliTest {
+  protected:
+    SetupAddress() { EXPECT_THAT(Run("init").text, HasSubstr("lookhaven setup-address")); }
+
+    // "valid", "void", or "none" when the text has no token.
+    std::string TokenIn(const std::string& text) {
+        std::smatch found;
+        if (!std::regex_search(text, found, std::regex("#setup=([0-9a-f]{48})"))) {
+            return "none";
+        }
+        try {
+            store::Store store = Open();
+            admin::RequireSetupToken(store, found[1].str(), base::WallSeconds());
+            return "valid";
+        } catch (const admin::InvalidToken&) {
+            return "void";
+        }
+    }
+
+    const std::filesystem::path file_ = home_ / "run/setup-address";
+};
+
+TEST_F(SetupAddress, IsThatOfTheWebServerAndTheNewestAloneIsValid) {
+    const std::string bare = Run("setup-address").text;
+    EXPECT_EQ(TokenIn(bare), "valid");
+    EXPECT_THAT(bare, Not(HasSubstr("http"))) << "nobody knows where";
+    std::ofstream(home_ / "run/nginx.conf") << "    listen 127.0.0.1:8181 sndbuf=192k;\n"
+                                               "    listen 8543 ssl http2 sndbuf=192k;\n"
+                                               "    listen [::]:8543 ssl http2 ipv6only=on sndbuf=192k;\n";
+    const std::string text = Run("setup-address --if-needed").text;
+    EXPECT_EQ(TokenIn(bare), "void");
+    EXPECT_EQ(TokenIn(text), "valid");
+    EXPECT_THAT(text, HasSubstr("http://127.0.0.1:8181/#setup="));
+    const std::string remote = "https://" + base::OwnHostName() + ":8543/#setup=";
+    EXPECT_NE(text.find(remote), text.npos) << text;
+    EXPECT_EQ(text.find(remote), text.rfind(remote)) << "once";
+    EXPECT_EQ(base::ReadFile(file_), text);
+    EXPECT_EQ(std::filesystem::status(file_).permissions(), std::filesystem::perms(0600));
+    EXPECT_EQ(TokenIn(Run("setup-address --json").text), "valid");
+}
+
+TEST_F(SetupAddress, IsRefusedOnceThereIsAnAccount) {
+    EXPECT_EQ(TokenIn(Run("setup-address").text), "valid");
+    EXPECT_EQ(Run("setup-address", "", true).code, 77) << "another user of this machine";
+    EXPECT_THAT(Run("user add ada --privilege owner", "ada-s3cret\n").text, HasSubstr("Added"));
+    Play({{"setup-address", 65, "there is an account already"}, {"setup-address --if-needed", 0, "", "#"}});
+    EXPECT_FALSE(std::filesystem::exists(file_)) << "what it holds is void";
+    EXPECT_THAT(Run("init").text, Not(HasSubstr("setup-address")));
+}
+
+}  // namespace
+}  // namespace lookhaven::cli
