@@ -11,8 +11,8 @@
 //   playback/  recordings: what is known of them (footage_cache, recorded_days); a player plays one, sync_playback those of
 //              several cameras at the same time
 //   ui/        app goes from screen to screen
-//     screens/    what fills the window: log-in, wall, events, maps, settings; what they have in common (screen), and their
-//                 addresses (route)
+//     screens/    what fills the window: log-in, first account (setup), wall, events, maps, settings; what they have in common
+//                 (screen), and their addresses (route)
 //     wall/       the grid of tiles and its layouts
 //     camera/     one camera live: its picture, the large view, snapshots
 //     events/     the stage of players with its transport controls; calendar, filter and list of events
@@ -31,6 +31,7 @@ import "./style/base.css";
 import "./style/components.css";
 import "./style/screen.css";
 import "./style/login.css";
+import "./style/setup.css";
 import "./style/picture.css";
 import "./style/wall.css";
 import "./style/large.css";

@@ -1,22 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Goes from the log-in to the screens, from screen to screen as the address says, and back to the log-in.
+// Goes from the log-in, or the first account, to the screens, from screen to screen as the address says, and back to the log-in.
 
 import { Server, type Account } from "../wire/server";
 import { EventsScreen } from "./screens/events_screen";
 import { keepTrying } from "./screens/keep_trying";
 import { loginScreen } from "./screens/login_screen";
 import { MapsScreen } from "./screens/maps_screen";
-import { followRoute, openScreen } from "./screens/route";
+import { followRoute, leaveSetup, openScreen, settingsAddress, setupToken } from "./screens/route";
 import type { Kept, Screen } from "./screens/screen";
 import { SettingsScreen } from "./screens/settings_screen";
+import { noAccountScreen, setupScreen } from "./screens/setup_screen";
 import { WallScreen } from "./screens/wall_screen";
 import { AbsentCameras } from "./wall/absent_cameras";
 import { element } from "./widgets/dom";
 import { hideNotice } from "./widgets/notice";
 import { titleScreen } from "./widgets/title";
 
-const keptFor = (userId: number): Kept => ({ userId, absentCameras: new AbsentCameras(), mapDraft: null, settingsDraft: null });
+const keptFor = (userId: number, isSettingUp = false): Kept => {
+  return { userId, absentCameras: new AbsentCameras(), mapDraft: null, settingsDraft: null, isSettingUp };
+};
 const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen, settings: SettingsScreen };
 
 export class App {
@@ -27,6 +30,8 @@ export class App {
   #kept = keptFor(0);
   /** Null at the log-in. */
   #screen: Screen | null = null;
+  /** As long as the server has none. */
+  #isWithoutAccounts = false;
 
   constructor(root: HTMLElement) {
     this.#root = root;
@@ -35,10 +40,16 @@ export class App {
   async start(): Promise<void> {
     this.#root.replaceChildren(element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" }));
     followRoute(() => this.#followRoute());
+    await this.#enter();
+  }
+
+  async #enter(): Promise<void> {
     const forever = new AbortController().signal;
-    const account = await keepTrying(() => this.#server.status(), (sentence) => this.#showWaiting(sentence), forever);
-    if (account) this.#showScreens(account);
-    else this.#showLogin("");
+    const status = await keepTrying(() => this.#server.status(), (sentence) => this.#showWaiting(sentence), forever);
+    this.#isWithoutAccounts = status === "no-account";
+    if (typeof status === "object") this.#showScreens(status);
+    else if (this.#isWithoutAccounts) this.#showSetup();
+    else this.#showLogin(setupToken() === null ? "" : "There is an account already. Please log in.");
   }
 
   /** Nobody can log in, nor need to, while the server does not say whether there is a session. */
@@ -50,16 +61,38 @@ export class App {
   /** `hint` says why the user is here again, if there is a reason. */
   #showLogin(hint: string): void {
     // A screen closes many requests, each of which may report once more that the session has ended.
-    if (this.#screen === null && this.#root.querySelector(".login")) return;
+    if (this.#screen === null && this.#root.querySelector(".login-form")) return;
     this.#screen?.close();
     this.#screen = this.#account = null;
     hideNotice();
+    if (setupToken() !== null) leaveSetup(location.pathname + location.search);
     titleScreen("Log in");
     this.#root.replaceChildren(loginScreen(this.#server, hint, (account) => this.#showScreens(account)));
     this.#root.querySelector("input")?.focus();
   }
 
+  /** What was typed stays where a newer address is opened. */
+  #showSetup(): void {
+    if (this.#root.querySelector(setupToken() === null ? ".entrance-form" : "form.entrance-form")) return;
+    titleScreen("Set up");
+    const made = (account: Account) => {
+      this.#kept = keptFor(account.user_id, true);
+      leaveSetup(settingsAddress("cameras", "new"));
+      this.#showScreens(account);
+    };
+    const hasAccount = (sentence: string) => {
+      this.#isWithoutAccounts = false;
+      this.#showLogin(sentence);
+    };
+    const screen = setupToken()
+      ? setupScreen(this.#server, setupToken, { made, hasAccount })
+      : noAccountScreen(() => this.#enter());
+    this.#root.replaceChildren(screen);
+    this.#root.querySelector("input")?.focus();
+  }
+
   #showScreens(account: Account): void {
+    this.#isWithoutAccounts = false;
     this.#account = account;
     if (this.#kept.userId !== account.user_id) this.#kept = keptFor(account.user_id);
     this.#followRoute();
@@ -68,6 +101,7 @@ export class App {
   /** False where the user stays at what is shown. */
   #followRoute(): boolean {
     const name = openScreen();
+    if (this.#isWithoutAccounts) this.#showSetup();
     if (!this.#account) return true;
     if (this.#screen?.name === name) return this.#screen.followRoute();
     if (this.#screen && !this.#screen.canLeave()) return false;

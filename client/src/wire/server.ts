@@ -114,14 +114,21 @@ export class Server {
     this.#onSessionEnd = onSessionEnd;
   }
 
-  /** The account of the running session, or null without one. */
-  async status(): Promise<Account | null> {
+  /** The account of the running session; without one, whether anybody could log in at all. */
+  async status(): Promise<Account | "logged-out" | "no-account"> {
     try {
       return await this.call<Account>("VEXO.Auth", "Status", {}, { quiet: true });
     } catch (error) {
-      if (error instanceof ServerError && error.status === 401) return null;
-      throw error;
+      const { status, data } = asServerError(error);
+      if (status !== 401) throw error;
+      return (data as { noAccount?: boolean } | null)?.noAccount ? "no-account" : "logged-out";
     }
+  }
+
+  /** Makes the first account, an owner's, and logs in. `token` is that of the one-time address. */
+  async makeFirstAccount(account: string, password: string, token: string): Promise<Account> {
+    const form = { account, password, token };
+    return this.call<Account>("VEXO.Auth", "MakeFirstAccount", {}, { form, quiet: true });
   }
 
   async login(account: string, password: string): Promise<Account> {

@@ -38,6 +38,9 @@ export class FakeServer {
   polls = 0;
   mostPollsAtOnce = 0;
   hasSession = false;
+  hasAccount = true;
+  /** With which the first account can be made. */
+  setupToken = "";
   /** Takes requests of the API and answers none. */
   isAway = false;
   jpeg: Buffer = Buffer.alloc(0);
@@ -70,7 +73,9 @@ export class FakeServer {
     if (this.isAway) return void request.socket.destroy();
     const method = searchParams.get("method");
     if (method === "Login") this.hasSession = true;
-    if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data: null } });
+    if (method === "MakeFirstAccount") return void this.#makeFirstAccount(request, answer);
+    const data = this.hasAccount ? null : { noAccount: true };
+    if (!this.hasSession) return json(answer, 401, { success: false, error: { code: 401, data } });
     if (method === "Logout") this.hasSession = false;
     const change = this.setup.methods[`${searchParams.get("api")}.${method}`];
     if (change) return void this.#setUp(change, request, answer);
@@ -83,8 +88,21 @@ export class FakeServer {
     }
     const camera = this.cameras.map((one) => ({ ...one, liveview_port: 1, cam_ptz: 0, sound_support: 0 }));
     const list = { camera, selected: 1, isManager: true, ShowAll: 1, CamNum: camera.length, EnableCamNum: camera.length };
-    const account = { account: "admin", user_id: 1, is_manager: this.isManager, players_per_session: this.archive.playersPerSession };
-    json(answer, 200, { success: true, data: method === "LoadCamera" ? list : account });
+    json(answer, 200, { success: true, data: method === "LoadCamera" ? list : this.#account });
+  }
+
+  get #account() {
+    return { account: "admin", user_id: 1, is_manager: this.isManager, players_per_session: this.archive.playersPerSession };
+  }
+
+  async #makeFirstAccount(request: IncomingMessage, answer: ServerResponse): Promise<void> {
+    let form = "";
+    for await (const piece of request) form += String(piece);
+    const refuse = (code: number, message: string) => json(answer, code, { success: false, error: { code, message, data: null } });
+    if (this.hasAccount) return refuse(409, "There is an account already.");
+    if (new URLSearchParams(form).get("token") !== this.setupToken) return refuse(403, "This address has expired.");
+    this.hasAccount = this.hasSession = true;
+    json(answer, 200, { success: true, data: this.#account });
   }
 
   async #setUp(change: SetupMethod, request: IncomingMessage, answer: ServerResponse): Promise<void> {

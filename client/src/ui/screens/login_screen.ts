@@ -8,19 +8,19 @@ import { icon } from "../widgets/icons";
 
 /** `hint` says why the user is here again, if there is a reason. */
 export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => void): HTMLElement {
-  const account = field("account", "Account", {
+  const account = entranceField("account", "Account", {
     type: "text",
     autocomplete: "username",
     autocapitalize: "none",
     spellcheck: "false",
   });
-  const password = field("password", "Password", { type: "password", autocomplete: "current-password" });
+  const password = entranceField("password", "Password", { type: "password", autocomplete: "current-password" });
   const submit = element("button", { type: "submit", class: "button primary" }, "Log in");
   const message = element("p", { class: "login-message", role: "alert" }, hint);
   const form = element(
     "form",
     { class: "login-form", method: "post" },
-    element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven")),
+    brand(),
     account.row,
     password.row,
     message,
@@ -48,7 +48,12 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
   return element("main", { class: "login" }, form);
 }
 
-function field(name: string, label: string, attributes: Record<string, string>) {
+export function brand(): HTMLElement {
+  return element("div", { class: "brand" }, icon("lighthouse"), element("h1", {}, "Lookhaven"));
+}
+
+/** A field with its label, as all have that can be seen without a session. */
+export function entranceField(name: string, label: string, attributes: Record<string, string>) {
   const input = element("input", { class: "input", id: name, name, ...attributes });
   return { input, row: element("label", { class: "field", for: name }, element("span", {}, label), input) };
 }

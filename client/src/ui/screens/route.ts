@@ -3,7 +3,8 @@
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
 // there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps,
 // and there #map=2, and of that map a camera, #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings,
-// and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or a new one, &open=new.
+// and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there
+// is an account, #setup= and a one-time token.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
@@ -20,6 +21,8 @@ const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;
 const kRecordIntervalMs = 500;
 const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?)?$/;
+
+const kSetupPattern = /^#setup=([0-9a-f]+)$/;
 
 /** What an entry of the browser's history keeps beside its address. */
 interface EntryState {
@@ -186,4 +189,15 @@ export function settingsAddress(section: SettingsSection, open: OpenSettings["op
 export function leaveSettingsRecord(): void {
   replace(settingsAddress(openSettings().section), false);
   announce();
+}
+
+/** The token of the one-time address at which the first account is made. */
+export function setupToken(): string | null {
+  return kSetupPattern.exec(location.hash)?.[1] ?? null;
+}
+
+/** Replaces the address, whose token is of no use any more. */
+export function leaveSetup(hash: string): void {
+  replace(hash, false);
+  shown = currentEntry();
 }

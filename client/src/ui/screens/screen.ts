@@ -29,6 +29,8 @@ export interface Kept {
   mapDraft: EditedMap | null;
   /** The same of the settings' page with this address. */
   settingsDraft: { address: string; draft: Draft } | null;
+  /** The first account was just made, and the steps that follow are not done. */
+  isSettingUp: boolean;
 }
 
 /** What a screen is opened with. */

@@ -16,6 +16,7 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { titleScreen } from "../widgets/title";
 import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "./route";
 import { Screen, type Kept, type Session } from "./screen";
+import { SetupSteps } from "./setup_steps";
 
 const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {
   cameras: ["Cameras", "camera"],
@@ -42,6 +43,7 @@ export class SettingsScreen extends Screen {
   readonly #kept: Kept;
   readonly #links: HTMLAnchorElement[] = [];
   readonly #place = element("div", { class: "settings-page" });
+  readonly #steps = new SetupSteps();
   #page: Page | null = null;
   /** The address of the page. */
   #address = "";
@@ -64,6 +66,7 @@ export class SettingsScreen extends Screen {
       this.#links.push(element("a", { class: "settings-link", href }, icon(name), element("span", {}, label)));
     }
     const sections = element("nav", { class: "settings-nav", "aria-label": "Settings" }, ...this.#links);
+    if (this.#kept.isSettingUp) this.front.append(this.#steps.root);
     this.front.append(element("div", { class: "settings-body" }, sections, this.#place));
     addEventListener("beforeunload", (event) => this.#page?.isChanged && event.preventDefault(), { signal: this.closed });
     this.#open();
@@ -72,6 +75,7 @@ export class SettingsScreen extends Screen {
   override close(): void {
     super.close();
     this.#closePage();
+    this.#kept.isSettingUp = false;
   }
 
   /** Asks first where changes would be lost. */
@@ -105,6 +109,7 @@ export class SettingsScreen extends Screen {
     this.#closePage();
     const route = openSettings();
     this.#address = addressOf(route);
+    this.#steps.show(route);
     const draft = this.#kept.settingsDraft?.address === this.#address ? this.#kept.settingsDraft.draft : null;
     if (draft) this.#kept.settingsDraft = null;
     const leave = (isAsked: boolean) => {
