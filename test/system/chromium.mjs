@@ -2,6 +2,8 @@
 //
 // What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits for a
 // line before each step and writes a line of JSON after it, so that the caller can look at the server in between.
+import { readFileSync } from "node:fs";
+import { createRequire } from "node:module";
 import { createInterface } from "node:readline";
 import { chromium } from "playwright-core";
 
@@ -11,6 +13,15 @@ const lines = createInterface({ input: process.stdin })[Symbol.asyncIterator]();
 export async function report(step, facts = {}) {
   console.log(JSON.stringify({ step, ...facts }));
   await lines.next();
+}
+
+const axe = readFileSync(createRequire(import.meta.url).resolve("axe-core/axe.min.js"), "utf8");
+
+/** What axe-core finds at what is shown. */
+export async function violations(page) {
+  await page.evaluate(axe);
+  const found = (await page.evaluate(() => window.axe.run())).violations;
+  return found.map(({ id, nodes }) => `${id}: ${nodes.map(({ target }) => target).join(" ")}`);
 }
 
 /** Gives the page, and a list that fills with what scripts and the content policy complain of. */

@@ -2,11 +2,8 @@
 //
 // One visit to every screen: what axe-core finds on a desk and on a phone, what the page is called, what has the focus.
 // Pictures of each are taken, at more sizes, where they are kept.
-import { readFileSync } from "node:fs";
-import { createRequire } from "node:module";
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, violations, visit } from "./chromium.mjs";
 
-const axe = readFileSync(createRequire(import.meta.url).resolve("axe-core/axe.min.js"), "utf8");
 const isKept = "LOOKHAVEN_KEEP_SCREENSHOTS" in process.env;
 const sizes = { desk: [1440, 900], laptop: [1024, 768], side: [844, 390], phone: [390, 844] };
 
@@ -15,19 +12,17 @@ await visit(async (page, complaints) => {
   const look = async (name, selector, judged = ["desk", "phone"]) => {
     await page.locator(selector).first().waitFor({ timeout: 20_000 });
     const facts = { title: await page.title(), focus: await page.evaluate(() => document.activeElement.textContent) };
-    const violations = [];
+    const all = [];
     for (const [size, [width, height]] of Object.entries(sizes)) {
       if (!isKept && !judged.includes(size)) continue;
       await page.setViewportSize({ width, height });
       await page.waitForTimeout(300);
       if (isKept) await page.screenshot({ path: `${folder}/${name}-${size}.png` });
       if (!judged.includes(size)) continue;
-      await page.evaluate(axe);
-      const found = (await page.evaluate(() => window.axe.run())).violations;
-      violations.push(...found.map(({ id, nodes }) => `${size}: ${id}: ${nodes.map(({ target }) => target).join(" ")}`));
+      all.push(...(await violations(page)).map((found) => `${size}: ${found}`));
     }
     await page.setViewportSize({ width: 1440, height: 900 });
-    await report(name, { ...facts, violations, complaints });
+    await report(name, { ...facts, violations: all, complaints });
   };
   const go = (hash) => page.evaluate((to) => void (location.hash = to), hash);
 

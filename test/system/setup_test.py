@@ -1,11 +1,13 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Set up in the browser, without a shell: a camera of the network with a plan, and an account that sees it alone and unheard.
+# Set up in the browser, without a shell: a camera of the network with a plan, and an account that sees it alone and unheard; and
+# all of it from an installation without an account.
 import json
+import re
 import subprocess
 import unittest
 
-from installation import BUILD, LIVE, PLAYER, Installation, Parts, call
+from installation import BUILD, LIVE, PASSWORDS, PLAYER, Installation, Parts, call
 from visit import Visit
 
 CAMERA = BUILD / "bin/rtsp-camera"
@@ -18,12 +20,44 @@ class SetupTest(unittest.TestCase):
         with Parts(*server.open(query, headers={"Cookie": f"id={session}"})) as stream:
             return {stream.next()[0]["content-type"].partition("/")[0] for _ in range(60)}
 
+    def simulated_camera(self):
+        """The address of an RTSP camera."""
+        simulated = self.enterContext(subprocess.Popen([CAMERA, "0"], stdout=subprocess.PIPE, text=True))
+        self.addCleanup(simulated.kill)
+        return f"rtsp://127.0.0.1:{int(simulated.stdout.readline())}/live"
+
+    @unittest.skipUnless(CAMERA.exists(), "the simulated camera is not built")
+    def test_from_nothing_to_a_camera_on_the_wall_by_the_printed_address(self):
+        server = self.enterContext(Installation(LOOKHAVEN_DEMO="no", LOOKHAVEN_ADMIN_PASSWORD=""))
+        self.assertNotIn("admin  ", server.said())
+        start = f"http://127.0.0.1:{server.port}/"
+        token = re.search(rf"^ *{re.escape(start)}#setup=([0-9a-f]{{48}})$", server.said(), re.M)[1]
+        self.assertIn(f":{server.tls_port}/#setup={token}", server.said())
+        server.stop()
+        server.start()
+        newer = re.search(rf"{re.escape(start)}#setup=([0-9a-f]{{48}})", server.said())[1]
+        with Visit("first_start.mjs", start, OLD=token, TOKEN=newer, CAMERA=self.simulated_camera()) as visit:
+            for step in ("no account", "replaced", "account", "camera", "storage", "wall"):
+                seen = visit.see(step)
+                with self.subTest(step):
+                    self.assertEqual(seen["violations"] + seen["complaints"], [])
+        headers = {"Content-Type": "application/json"}
+        PASSWORDS["ada"] = "correct horse"
+        entries = server.request(call("VEXO.System", "Audit"), "ada", body="{}", headers=headers).json["data"]["entry"]
+        self.assertEqual([(one["action"], one["who"]) for one in entries], [("camera.add", "ada"), ("user.add", "one-time address")])
+        camera = server.request(call("VEXO.Camera", "List"), "ada", body="{}", headers=headers).json["data"]["camera"]
+        self.assertEqual([one["name"] for one in camera], ["Gate"])
+        logs = "".join(file.read_text() for file in (server.home / "log").iterdir())
+        for secret in (token, newer):
+            self.assertNotIn(secret, logs)
+        server.stop()
+        server.start()
+        self.assertNotIn("#setup", server.said())
+
     @unittest.skipUnless(CAMERA.exists(), "the simulated camera is not built")
     def test_a_camera_a_plan_and_an_account(self):
         server = self.enterContext(Installation())
-        simulated = self.enterContext(subprocess.Popen([CAMERA, "0"], stdout=subprocess.PIPE, text=True))
-        self.addCleanup(simulated.kill)
-        source = f"rtsp://127.0.0.1:{int(simulated.stdout.readline())}/live"
+        source = self.simulated_camera()
         with Visit("setup.mjs", f"http://127.0.0.1:{server.port}/", CAMERA=source) as visit:
             tried = visit.see("tried")
             self.assertEqual(tried["size"], [320, 240])
