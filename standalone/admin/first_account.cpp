@@ -13,7 +13,8 @@ namespace lookhaven::admin {
 namespace {
 
 constexpr std::size_t kTokenBytes = 24;
-// Its value is the token's digest, a space, and when it expires; empty once the token was used.
+// Its value is the token's digest, the boot in which it was given out, and its seconds then; empty once the token was
+// used.
 constexpr const char* kSetupTokenSetting = "setup_token";
 
 void RequireNoAccount(store::Store& store) {
@@ -24,13 +25,13 @@ void RequireNoAccount(store::Store& store) {
 
 }  // namespace
 
-std::string NewSetupToken(store::Store& store, std::int64_t now_s) {
+std::string NewSetupToken(store::Store& store, const base::BootTime& now) {
     std::string token = store::RandomHex(kTokenBytes);
     store::InTransaction(store, [&] {
         store::Users(store).Lock();
         RequireNoAccount(store);
         store::Settings(store).Set(kSetupTokenSetting,
-                                   store::Digest(token) + ' ' + std::to_string(now_s + kSetupTokenLifetimeS));
+                                   store::Digest(token) + ' ' + now.boot + ' ' + std::to_string(now.seconds));
     });
     return token;
 }
@@ -39,26 +40,26 @@ std::filesystem::path SetupAddressFile(const base::Installation& installation) {
     return installation.RunFolder() / "setup-address";
 }
 
-void RequireSetupToken(store::Store& store, std::string_view token, std::int64_t now_s) {
+void RequireSetupToken(store::Store& store, std::string_view token, const base::BootTime& now) {
     RequireNoAccount(store);
     const std::string valid = store::Settings(store).Find(kSetupTokenSetting).value_or("");
-    const std::string presented = store::Digest(token) + ' ';
-    std::int64_t expires_s = 0;
+    const std::string presented = store::Digest(token) + ' ' + now.boot + ' ';
+    std::int64_t given_s = now.seconds - kSetupTokenLifetimeS;
     if (valid.starts_with(presented)) {
-        std::from_chars(valid.data() + presented.size(), valid.data() + valid.size(), expires_s);
+        std::from_chars(valid.data() + presented.size(), valid.data() + valid.size(), given_s);
     }
-    // A clock that was set back must not lengthen its life.
-    if (now_s >= expires_s || now_s < expires_s - kSetupTokenLifetimeS) {
+    if (now.seconds - given_s >= kSetupTokenLifetimeS) {
         throw InvalidToken("wrong or expired setup token");
     }
 }
 
 store::User AddFirstAccount(store::Store& store, std::string_view token, const std::string& name,
-                            const store::HashedPassword& password, const std::string& address, std::int64_t now_s) {
+                            const store::HashedPassword& password, const std::string& address,
+                            const base::BootTime& now) {
     store::User user;
     store::InTransaction(store, [&] {
         store::Users(store).Lock();
-        RequireSetupToken(store, token, now_s);
+        RequireSetupToken(store, token, now);
         const Json::Value record = AddUser(store, {0, "one-time address", address}, name,
                                            {.password = password, .privilege = store::Privilege::kOwner});
         store::Settings(store).Set(kSetupTokenSetting, "");

@@ -76,7 +76,7 @@ std::string MakeFirstAccount(const Call& call) {
     try {
         CheckSetupToken(call, token);
         const store::User user =
-            admin::AddFirstAccount(records, token, name, Hash(call, password), address, base::WallSeconds());
+            admin::AddFirstAccount(records, token, name, Hash(call, password), address, base::TimeSinceBoot());
         std::error_code ignored;  // what the file holds is of no use any more
         std::filesystem::remove(admin::SetupAddressFile(installation), ignored);
         return LoggedIn(call, user, store::Sessions(records).Create(user.id, base::WallSeconds(), address));
@@ -87,8 +87,7 @@ std::string MakeFirstAccount(const Call& call) {
         LogRefused(installation, name, address, error.what());
         throw Failure(403, "This address has expired or was replaced by a newer one. On the server, the command"
                            " lookhaven setup-address prints another.");
-    } catch (const store::AlreadyExists& error) {
-        LogRefused(installation, name, address, error.what());
+    } catch (const store::AlreadyExists&) {
         throw Failure(409, "There is an account already. Please log in.");
     }
 }

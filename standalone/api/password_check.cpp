@@ -83,12 +83,16 @@ store::VerifiedUser Reauthenticate(const Call& call, const std::string& paramete
 }
 
 void CheckSetupToken(const Call& call, const std::string& token) {
-    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
-    const std::int64_t now_s = base::WallSeconds();
-    store::LoginThrottle throttle(call.Records());
-    RefuseUnlessNow(throttle.Enter(kSetup, network, now_s));
-    admin::RequireSetupToken(call.Records(), token, now_s);
-    throttle.Clear(kSetup, network);
+    try {
+        admin::RequireSetupToken(call.Records(), token, base::TimeSinceBoot());
+    } catch (const admin::InvalidToken&) {
+        // After the look at the token: whoever shares the owner's network must not keep the right one out.
+        const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+        store::LoginThrottle throttle(call.Records());
+        RefuseUnlessNow(throttle.Wait(kSetup, network, base::WallSeconds()));
+        RefuseUnlessNow(throttle.Enter(kSetup, network, base::WallSeconds()));
+        throw;
+    }
 }
 
 std::string RequireNewPassword(const Call& call, const std::string& parameter) {

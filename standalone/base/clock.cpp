@@ -1,9 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/clock.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <ctime>
+#include <utility>
+
+#include "standalone/base/file.h"
 
 namespace lookhaven::base {
 
@@ -27,6 +31,12 @@ std::int64_t WallMillis() {
 
 std::int64_t WallSeconds() {
     return WallMillis() / 1000;
+}
+
+BootTime TimeSinceBoot() {
+    std::string boot = ReadFile("/proc/sys/kernel/random/boot_id");
+    boot.erase(std::min(boot.find('\n'), boot.size()));
+    return {std::move(boot), Micros(CLOCK_BOOTTIME) / 1'000'000};
 }
 
 std::string FormatUtc(std::int64_t wall_millis) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The two clocks: durations come from the monotonic one, dates from the wall clock.
+// The clocks: durations come from the monotonic ones, dates from the wall clock.
 #pragma once
 
 #include <cstdint>
@@ -14,6 +14,13 @@ std::int64_t MonotonicMicros();
 // Since the epoch (UTC).
 std::int64_t WallMillis();
 std::int64_t WallSeconds();
+
+// Which nobody sets: seconds that include suspension, comparable within one boot, whose id goes along.
+struct BootTime {
+    std::string boot;
+    std::int64_t seconds = 0;
+};
+BootTime TimeSinceBoot();
 
 // "2026-03-01T08:15:30.123Z"
 std::string FormatUtc(std::int64_t wall_millis);

@@ -61,12 +61,13 @@ void Print(const Console& console, const Request& request) {
         return;
     }
     const std::vector<std::string> addresses =
-        AddressesOf(installation, "#setup=" + admin::NewSetupToken(store, base::WallSeconds()));
+        AddressesOf(installation, "#setup=" + admin::NewSetupToken(store, base::TimeSinceBoot()));
     const std::string text = TextOf(addresses);
-    base::WriteFileAtomically(file, text + '\n');
+    // First: the one before is void already, should there be no room for the file.
     console.Answer(
         Object("address", Array(addresses, std::identity()), "seconds", Json::Int64{admin::kSetupTokenLifetimeS}),
         text);
+    base::WriteFileAtomically(file, text + '\n');
 }
 
 }  // namespace

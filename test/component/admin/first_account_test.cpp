@@ -17,16 +17,20 @@ using store::EngineName;
 using testing::HasSubstr;
 using testing::Not;
 
-constexpr std::int64_t kNow = 1'764'000'000;
 constexpr std::int64_t kMinute = 60;
+
+// So many seconds after the test's present.
+base::BootTime At(std::int64_t later_s) {
+    return {"this boot", 5000 + later_s};
+}
 
 class FirstAccount : public store::StoreTest {
   protected:
     // "made", "invalid token", "bad name" or "has account".
-    std::string Try(store::Store& store, const std::string& token, std::int64_t now_s,
+    std::string Try(store::Store& store, const std::string& token, const base::BootTime& now,
                     const std::string& name = "ada") {
         try {
-            AddFirstAccount(store, token, name, password_, "192.0.2.7", now_s);
+            AddFirstAccount(store, token, name, password_, "192.0.2.7", now);
             return "made";
         } catch (const InvalidToken&) {
             return "invalid token";
@@ -36,8 +40,8 @@ class FirstAccount : public store::StoreTest {
             return "bad name";
         }
     }
-    std::string Try(const std::string& token, std::int64_t now_s, const std::string& name = "ada") {
-        return Try(store_, token, now_s, name);
+    std::string Try(const std::string& token, const base::BootTime& now, const std::string& name = "ada") {
+        return Try(store_, token, now, name);
     }
 
     const store::HashedPassword password_{"correct horse"};
@@ -45,32 +49,32 @@ class FirstAccount : public store::StoreTest {
 };
 
 TEST_P(FirstAccount, IsMadeByAValidTokenAlone) {
-    EXPECT_EQ(Try("", kNow), "invalid token") << "none was given out";
-    const std::string replaced = NewSetupToken(store_, kNow - kMinute);
-    const std::string token = NewSetupToken(store_, kNow);
+    EXPECT_EQ(Try("", At(0)), "invalid token") << "none was given out";
+    const std::string replaced = NewSetupToken(store_, At(-kMinute));
+    const std::string token = NewSetupToken(store_, At(0));
     ASSERT_EQ(token.size(), 48U);
     const struct {
         const char* attempt;
         std::string token;
-        std::int64_t now_s;
+        base::BootTime now;
         const char* name;
         const char* outcome;
     } rows[] = {
-        {"the one before", replaced, kNow, "ada", "invalid token"},
-        {"after its time", token, kNow + 15 * kMinute, "ada", "invalid token"},
-        {"by a clock that was set back", token, kNow - 1, "ada", "invalid token"},
-        {"without one", "", kNow, "ada", "invalid token"},
-        {"a part of it", token.substr(1), kNow, "ada", "invalid token"},
-        {"what the store has", store::Settings(store_).Find("setup_token").value(), kNow, "ada", "invalid token"},
-        {"as what no account is called", token, kNow, "lookhaven", "bad name"},
-        {"in its last second", token, kNow + 15 * kMinute - 1, "ada", "made"},
-        {"once more", token, kNow, "eve", "has account"},
+        {"the one before", replaced, At(0), "ada", "invalid token"},
+        {"after its time", token, At(15 * kMinute), "ada", "invalid token"},
+        {"after a restart of the machine", token, {"another boot", 5000}, "ada", "invalid token"},
+        {"without one", "", At(0), "ada", "invalid token"},
+        {"a part of it", token.substr(1), At(0), "ada", "invalid token"},
+        {"what the store has", store::Settings(store_).Find("setup_token").value(), At(0), "ada", "invalid token"},
+        {"as what no account is called", token, At(0), "lookhaven", "bad name"},
+        {"in its last second", token, At(15 * kMinute - 1), "ada", "made"},
+        {"once more", token, At(0), "eve", "has account"},
     };
     for (const auto& row : rows) {
-        EXPECT_EQ(Try(row.token, row.now_s, row.name), row.outcome) << row.attempt;
+        EXPECT_EQ(Try(row.token, row.now, row.name), row.outcome) << row.attempt;
     }
     for (const std::string& bytes : store::kHostileTexts) {
-        EXPECT_EQ(Try(bytes, kNow), "has account");
+        EXPECT_EQ(Try(bytes, At(0)), "has account");
     }
     const auto ada = users_.CheckPassword("ada", "correct horse");
     ASSERT_TRUE(ada);
@@ -80,19 +84,19 @@ TEST_P(FirstAccount, IsMadeByAValidTokenAlone) {
     EXPECT_EQ(entries[0].action + " " + entries[0].who + " " + entries[0].address,
               "user.add one-time address 192.0.2.7");
     EXPECT_THAT(entries[0].after, Not(HasSubstr("horse")));
-    EXPECT_THROW(NewSetupToken(store_, kNow), store::AlreadyExists);
+    EXPECT_THROW(NewSetupToken(store_, At(0)), store::AlreadyExists);
     users_.Remove(ada->id);
-    EXPECT_EQ(Try(token, kNow), "invalid token") << "used, though nobody has an account";
+    EXPECT_EQ(Try(token, At(0)), "invalid token") << "used, though nobody has an account";
 }
 
 TEST_P(FirstAccount, IsOneHoweverManyTakeItsTokenAtOnce) {
     for (int round = 0; round < 5; ++round) {
-        const std::string token = NewSetupToken(store_, kNow);
+        const std::string token = NewSetupToken(store_, At(0));
         std::atomic<int> next = 0;
         std::atomic<int> made = 0;
         InParallel(4, [&](store::Store& store) {
             const std::string name = "visitor" + std::to_string(next++);
-            made += Try(store, token, kNow, name) == "made" ? 1 : 0;
+            made += Try(store, token, At(0), name) == "made" ? 1 : 0;
         });
         EXPECT_EQ(made, 1);
         ASSERT_EQ(users_.List().size(), 1U);
@@ -101,11 +105,11 @@ TEST_P(FirstAccount, IsOneHoweverManyTakeItsTokenAtOnce) {
 }
 
 TEST_P(FirstAccount, HasATokenThatTheStoreDoesNotTell) {
-    const std::string token = NewSetupToken(store_, kNow);
+    const std::string token = NewSetupToken(store_, At(0));
     EXPECT_THAT(store::Settings(store_).Find("setup_token").value(), Not(HasSubstr(token)));
-    EXPECT_NE(token, NewSetupToken(store_, kNow));
+    EXPECT_NE(token, NewSetupToken(store_, At(0)));
     for (const std::string& bytes : store::kHostileTexts) {
-        EXPECT_EQ(Try(bytes, kNow), "invalid token");
+        EXPECT_EQ(Try(bytes, At(0)), "invalid token");
     }
 }
 

@@ -33,7 +33,7 @@ class FirstAccountApi : public testing::Test {
         return host_.Ask("api=VEXO.Auth&version=1&method=MakeFirstAccount" + query, "", std::move(headers), body);
     }
     Answer Status() const { return host_.Ask("api=VEXO.Auth&version=1&method=Status", ""); }
-    std::string NewToken() { return admin::NewSetupToken(store_, base::WallSeconds()); }
+    std::string NewToken() { return admin::NewSetupToken(store_, base::TimeSinceBoot()); }
     std::string Log(const char* name) const { return base::ReadFile(host_.Home().LogFolder() / name); }
 
     HostUnderTest host_;
@@ -103,9 +103,8 @@ TEST_F(FirstAccountApi, GuessesAreLimitedByNetworkAndHashNothing) {
         EXPECT_EQ(guess(wrong, "2001:db8::1"), 403);
     }
     EXPECT_EQ(guess(wrong, "2001:db8::2"), 429);
-    EXPECT_EQ(guess(token, "2001:db8::3"), 429) << "a right one, too";
     EXPECT_TRUE(users_.IsEmpty());
-    EXPECT_EQ(guess(token, "192.0.2.7"), 200);
+    EXPECT_EQ(guess(token, "2001:db8::3"), 200) << "a neighbour's guesses keep nobody out";
 }
 
 }  // namespace

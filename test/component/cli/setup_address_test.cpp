@@ -29,7 +29,7 @@ class SetupAddress : public CliTest {
         }
         try {
             store::Store store = Open();
-            admin::RequireSetupToken(store, found[1].str(), base::WallSeconds());
+            admin::RequireSetupToken(store, found[1].str(), base::TimeSinceBoot());
             return "valid";
         } catch (const admin::InvalidToken&) {
             return "void";
