@@ -135,6 +135,9 @@ void RecordingWriter::Close() {
     if (!has_failed_ && output_ != nullptr) {
         End();
     }
+    if (has_failed_) {
+        IndexWhatIsWhole();
+    }
     OnDisk([&] {
         if (frame_count_ == 0) {
             Remove();
@@ -166,6 +169,15 @@ void RecordingWriter::End() {
     output_.reset();  // it cannot be ended twice
 }
 
+// Clusters may have come to the disk whole before it failed.
+void RecordingWriter::IndexWhatIsWhole() {
+    try {
+        AppendToIndex();
+    } catch (const std::exception&) {
+        return;  // they are cut off
+    }
+}
+
 // The path leads elsewhere while the disk is away, so the file itself is asked whether it is gone.
 void RecordingWriter::Remove() const {
     archive::RemoveFile(archive::IndexPathOf(path_));
@@ -193,14 +205,14 @@ void RecordingWriter::Sync() const {
 }
 
 void RecordingWriter::AppendToIndex() {
-    std::vector<archive::FrameEntry> frames;
-    while (blocks_->ReadCluster(frames)) {
+    while (blocks_->ReadCluster(unindexed_)) {
     }
-    index_->Append(frames);
-    frame_count_ += static_cast<int>(frames.size());
-    for (const archive::FrameEntry& frame : frames) {
+    index_->Append(unindexed_);
+    frame_count_ += static_cast<int>(unindexed_.size());
+    for (const archive::FrameEntry& frame : unindexed_) {
         latest_ms_ = std::max<std::int64_t>(latest_ms_, frame.time_ms);
     }
+    unindexed_.clear();
     end_bytes_ = blocks_->Position();
 }
 

@@ -63,9 +63,9 @@ class RecordingWriter {
     // viewer who wants the newest frames, and when no packet comes. Throws as Write.
     void Flush();
 
-    // Flushes, writes what makes the file seekable for other programs, and marks the index finished. What the disk does
-    // not take now, or did not take before, is cut off, with a warning in the log; a recording without a frame is
-    // removed. Throws WriteError when the file cannot even be finished so; call it again later then. Also allowed after
+    // Flushes, writes what makes the file seekable for other programs, and marks the index finished. Clusters that the
+    // disk does not take, or did not take whole before, are cut off, with a warning in the log; a recording without a
+    // frame is removed. Throws WriteError when the file cannot even be finished so; call it again later then. Also allowed after
     // it succeeded.
     void Close();
 
@@ -80,6 +80,7 @@ class RecordingWriter {
     template <class Step>
     void WriteOrFail(Step step);
     void End();
+    void IndexWhatIsWhole();
     void Remove() const;
     void Sync() const;
     void AppendToIndex();
@@ -101,7 +102,8 @@ class RecordingWriter {
     bool is_finished_ = false;
     int frame_count_ = 0;
     std::int64_t latest_ms_ = 0;
-    std::uint64_t end_bytes_ = 0;  // of the last whole cluster
+    std::vector<archive::FrameEntry> unindexed_;  // of whole clusters, up to the position of blocks_
+    std::uint64_t end_bytes_ = 0;                 // of the last whole cluster that is indexed
 };
 
 }  // namespace lookhaven::media

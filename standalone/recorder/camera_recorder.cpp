@@ -42,6 +42,8 @@ CameraRecorder::CameraRecorder(int camera, RecorderContext context) : camera_(ca
 
 CameraRecorder::~CameraRecorder() {
     Close();
+    finish_again_us_ = 0;
+    FinishLeft();
 }
 
 void CameraRecorder::Take(Frame frame) {

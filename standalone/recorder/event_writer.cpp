@@ -74,14 +74,12 @@ void EventWriter::Flush() {
 }
 
 void EventWriter::Close() {
-    row_.recording = false;
-    try {
-        writer_.Close();
-    } catch (...) {
-        NoteProgress();
-        throw;
+    writer_.Close();
+    // Once, for retention may remove the event from then on.
+    if (std::exchange(row_.recording, false)) {
+        PutRow();
     }
-    NoteProgress();
+    LogSeconds();
 }
 
 // Rounded up to whole seconds, at least one: a search never finds an event without a duration.
@@ -91,9 +89,13 @@ std::int64_t EventWriter::EndS() const {
 }
 
 void EventWriter::NoteProgress() {
-    if (writer_.FrameCount() == row_.frame_count && row_.recording) {
-        return;
+    if (writer_.FrameCount() != row_.frame_count) {
+        PutRow();
+        LogSeconds();
     }
+}
+
+void EventWriter::PutRow() {
     row_.frame_count =
         row_.recording ? writer_.FrameCount() : ShownFrames(start_.mount / row_.path, writer_.FrameCount());
     row_.size_bytes = static_cast<std::int64_t>(writer_.SizeBytes());
@@ -101,10 +103,14 @@ void EventWriter::NoteProgress() {
     if (row_.frame_count > 0) {
         rows_.Put(row_);
     }
+}
+
+void EventWriter::LogSeconds() {
     if (row_.frame_count > 0) {
-        for (const Seconds& seconds : std::exchange(before_gaps_, {})) {
+        for (const Seconds& seconds : before_gaps_) {
             Log(seconds.begin, seconds.end);
         }
+        before_gaps_.clear();
         Log(footage_since_s_, row_.end_s);
     }
 }

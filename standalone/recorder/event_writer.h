@@ -40,13 +40,15 @@ class EventWriter {
     void Write(const Frame& frame, bool after_gap = false);
     void Flush();
     // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
-    // when the file cannot be finished; then the row describes what was flushed, and Close may be tried again later.
-    // Recovery or verify finishes what is left so.
+    // when the file cannot be finished, and may be called again later then; until it succeeds the row is that of an open
+    // event, which retention leaves alone and recovery finishes.
     void Close();
 
   private:
     std::int64_t EndS() const;
     void NoteProgress();
+    void PutRow();
+    void LogSeconds();
     void Log(std::int64_t begin_s, std::int64_t end_s);
 
     const EventStart start_;
