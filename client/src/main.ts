@@ -2,9 +2,9 @@
 //
 // Starts the web client. Where things are:
 //
-//   wire/      the network: the web API (server, recordings, exports, emaps; for managers camera_setup, people, mounts,
-//              audit), the parts of an endless answer (multipart), requests that end in time (deadline) and take turns
-//              (semaphore)
+//   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
+//              people, mounts, audit), the parts of an endless answer (multipart), requests that end in time (deadline) and
+//              take turns (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
@@ -15,11 +15,12 @@
 //                 (screen), and their addresses (route)
 //     wall/       the grid of tiles and its layouts
 //     camera/     one camera live: its picture, the large view, snapshots
-//     events/     the stage of players with its transport controls; calendar, filter and list of events
+//     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
 //     settings/   the sections of the settings: cameras, accounts, storage, audit. Each has a list and a page of one record
-//                 (page, record_form), which notices what others have changed meanwhile (merge, conflict_panel)
+//                 (record_page), whose form (record_form) notices what others have changed meanwhile (merge,
+//                 conflict_panel)
 //     widgets/    what all of these use: elements, buttons, icons, fields, dialogs, texts, titles, notices, keys, panning and
 //                 zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
@@ -37,6 +38,8 @@ import "./style/wall.css";
 import "./style/large.css";
 import "./style/snapshot.css";
 import "./style/dialog.css";
+import "./style/stage.css";
+import "./style/transport.css";
 import "./style/events.css";
 import "./style/calendar.css";
 import "./style/event_filter.css";

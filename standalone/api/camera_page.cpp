@@ -58,7 +58,7 @@ void CameraPage::AddState(Json::Value& record) const {
     }
     const auto status = states_.find(id);
     const bool is_lost = status != states_.end() && status->second.lost_since_s > 0;
-    record["state"] = !record["enabled"].asBool() ? "off"
+    record["state"] = !record["enabled"].asBool() ? "disabled"
                       : !is_recorder_alive_       ? "unknown"
                       : is_lost                   ? "no-signal"
                       : has_picture               ? "running"

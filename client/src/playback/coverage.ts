@@ -2,7 +2,8 @@
 //
 // What of a span was recorded, as segments for a timeline; and the kinds of events that the user tells apart.
 
-import type { EventKind, Footage, Runs } from "../wire/recordings";
+import type { EventKind, Footage } from "../wire/footage";
+import type { Runs } from "../wire/recordings";
 
 export interface Segment {
   startS: number;

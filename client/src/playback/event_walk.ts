@@ -3,7 +3,8 @@
 // The events before and after the one that is open, as the user has filtered them; known before they are asked for, so that
 // the controls can say what comes next.
 
-import type { EventPlace, Footage, Recordings } from "../wire/recordings";
+import type { Footage } from "../wire/footage";
+import type { EventPlace, Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 
 export type Direction = -1 | 1;

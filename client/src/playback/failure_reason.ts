@@ -2,7 +2,8 @@
 //
 // Why a recording does not play, for the user; and which failures pass by themselves.
 
-import type { Footage, Recordings } from "../wire/recordings";
+import type { Footage } from "../wire/footage";
+import type { Recordings } from "../wire/recordings";
 import type { ServerError } from "../wire/server";
 
 const kShowsWarning = 200;

@@ -5,7 +5,8 @@
 // Why so        A timeline that is dragged asks for the same hours again and again, and each answer covers hours of all
 //               cameras. So time is cut into spans of fixed borders; those that reach the present are fetched again.
 
-import type { Footage, Recordings } from "../wire/recordings";
+import type { Footage } from "../wire/footage";
+import type { Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { segmentsOf, type Segment } from "./coverage";
 import { RequestQueue } from "./request_queue";

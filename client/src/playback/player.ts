@@ -3,36 +3,30 @@
 // Plays one recording after another in one place on the screen: play, pause, step, seek, rate.
 //
 // Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream, and
-//               every seek opens another. While paused there is no connection at all. A held
-//               key or a dragged playhead asks for more frames than can be fetched: then only the last is.
-//
-//               A stream counts frames, and each carries its time; which frame a time has, only the server knows.
+//               every seek opens another. While paused there is no connection at all. A held key or a dragged playhead asks
+//               for more frames than can be fetched: then only the last is.
 //
 //               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
 //               growing recording continues as it grows, and ends with it. Where the connection is lost, another stream goes on
 //               from the frame on the screen.
 
 import { delay } from "../wire/delay";
-import { isSameFootage, newStreamKey, type Footage, type FrameStart, type Recordings } from "../wire/recordings";
+import { isSameFootage, type Footage } from "../wire/footage";
+import { newStreamKey, type FrameStart, type Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { isPassing, reasonOf } from "./failure_reason";
 import { readFrames, type RecordedFrame } from "./frame_stream";
 import type { PlayerState } from "./player_state";
 import { kMaxFrameMs, ShownFrame } from "./shown_frame";
+import { startAt, startOfStep, type Start } from "./start";
 import { StillReader } from "./still_reader";
+import { streamEnd } from "./stream_end";
 
 const kTailDelayMs = 1_000;
-/** The server waits longer for what is still being recorded, and not at all when another player takes over. */
-const kTailSilenceMs = 1_500;
 /** At rate 1 a frame comes at least every second; opening a stream takes longer where the server is busy. */
 const kMaxSilenceMs = 8_000;
 /** Between attempts to get a lost stream back. */
 const kRetryMs = 1_000;
-/** How many frames a step back fetches. */
-const kStepBackFrames = 12;
-
-/** Where playing begins, or what a still shows: a frame, or the frame of a time in Unix milliseconds. */
-type Start = FrameStart | { atMs: number };
 
 export class Player {
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
@@ -103,7 +97,7 @@ export class Player {
       this.#stills.forget();
     }
     this.#take(footage);
-    const start = this.#startAt(atMs);
+    const start = startAt(footage, atMs);
     if (isPlaying) void this.#play(start);
     else this.#showStill(start);
   }
@@ -127,8 +121,7 @@ export class Player {
     const from = this.#wanted && "index" in this.#wanted ? this.#wanted.index : this.index;
     const last = this.#footage.isGrowing || this.#frameCount === 0 ? Infinity : this.#frameCount - 1;
     const index = Math.max(0, Math.min(from + by, last));
-    const start: Start = by < 0 ? { index, from: Math.max(0, index - kStepBackFrames + 1) } : { index };
-    if (index !== this.index || this.#state.kind !== "paused") this.#showStill(start);
+    if (index !== this.index || this.#state.kind !== "paused") this.#showStill(startOfStep(index, by));
   }
 
   /** Changes a running stream, without interruption where the server can do that. */
@@ -166,12 +159,6 @@ export class Player {
   #take(footage: Footage): void {
     this.#footage = footage;
     this.#frameCount = Math.max(this.#frameCount, footage.frameCount);
-  }
-
-  #startAt(atMs: number): Start {
-    const { start, frameCount } = this.#footage!;
-    // Of a mark nobody has told how many frames it has.
-    return atMs <= start * 1000 && frameCount > 0 ? { index: 0 } : { atMs: Math.round(atMs) };
   }
 
   /** The frame to begin with; null when the server does not say, which has become the state. */
@@ -280,32 +267,28 @@ export class Player {
     this.#changed();
   }
 
-  /**
-   * Whether there is more to play after the server has ended the stream; else the state says why not. The server cannot be
-   * asked whether this player was preempted, so that is concluded from how the stream ended.
-   */
+  /** Whether there is more to play after the server has ended the stream; else the state says why not. */
   async #continues(signal: AbortSignal): Promise<boolean> {
-    const before = this.#footage!;
-    const wasAtTail = before.isGrowing && performance.now() - this.#lastFrameMs >= kTailSilenceMs;
-    const footage = await this.#recordings.find(before).catch((error: ServerError) => (isPassing(error) ? "lost" : before));
+    const ageMs = performance.now() - this.#lastFrameMs;
+    const last = { index: this.index, ageMs, rate: this.#rate, frameCount: this.#frameCount };
+    const end = await streamEnd(this.#recordings, this.#footage!, last);
     if (signal.aborted) return false;
-    if (footage === "lost") {
+    if (end.kind === "lost") {
       await this.#awaitReturn(signal);
       return !signal.aborted;
     }
-    if (!footage) {
+    if (end.kind === "removed") {
       await this.#fail(new ServerError(404, 0, ""), signal);
       return false;
     }
-    this.#take(footage);
-    const isAtEnd = !footage.isGrowing && this.index + Math.max(1, this.#rate) >= this.#frameCount;
-    if (!wasAtTail || isAtEnd) {
-      this.#become({ kind: wasAtTail ? "ended" : "preempted" });
+    this.#take(end.footage);
+    if (end.kind !== "more") {
+      this.#become({ kind: end.kind });
       return false;
     }
     // At the end of what is recorded so far, playback cannot be faster than the camera.
-    if (footage.isGrowing && this.#rate > 1) this.#rate = 1;
-    if (footage.isGrowing) await delay(kTailDelayMs, signal);
+    if (end.footage.isGrowing && this.#rate > 1) this.#rate = 1;
+    if (end.footage.isGrowing) await delay(kTailDelayMs, signal);
     return !signal.aborted;
   }
 

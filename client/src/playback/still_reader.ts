@@ -5,7 +5,8 @@
 // Why so        A frame is decoded from the key frame before it on. So a step back keeps the frames that are passed for the
 //               steps after it.
 
-import { newStreamKey, type Footage, type FrameStart, type Recordings } from "../wire/recordings";
+import type { Footage } from "../wire/footage";
+import { newStreamKey, type FrameStart, type Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { readFrames, type RecordedFrame } from "./frame_stream";
 

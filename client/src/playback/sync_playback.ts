@@ -7,7 +7,8 @@
 //               others join as soon as they have something at the playhead, and are realigned when they drift apart. A pause
 //               shows what each camera had at the time of the leading one's picture.
 
-import type { Footage, Recordings } from "../wire/recordings";
+import type { Footage } from "../wire/footage";
+import type { Recordings } from "../wire/recordings";
 import type { FootageCache } from "./footage_cache";
 import { Player } from "./player";
 

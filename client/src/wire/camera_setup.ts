@@ -58,7 +58,7 @@ export interface CameraRecord extends CameraSettings {
   hasPassword: boolean;
   codec: string;
   /** "idle": nobody asks for its picture; "unknown": the recorder does not run. */
-  state: "running" | "connecting" | "no-signal" | "off" | "idle" | "unknown";
+  state: "running" | "connecting" | "no-signal" | "disabled" | "idle" | "unknown";
   /** Why there is no signal; may be empty. */
   reason: string;
   /** What becomes of its recording, such as "recording" or "disk-full"; empty where it has none. */

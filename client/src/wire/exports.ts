@@ -2,7 +2,7 @@
 //
 // What is taken away as files, and what is kept from retention.
 
-import { kindParameter, type Footage, type FootageRef } from "./recordings";
+import { kindParameter, type Footage, type FootageRef } from "./footage";
 import { address, type Server } from "./server";
 
 /** What an export will be. */

@@ -1,57 +1,20 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recordings of the web API: events, coverage, days, marks; and the streams that play them.
+// Recordings of the web API: what was recorded when, where the frames of a time are, and the streams that play them.
 
+import {
+  footageOf,
+  kindParameter,
+  markOf,
+  type EventKind,
+  type Footage,
+  type FootageKind,
+  type FootageRef,
+  type RawEvent,
+  type RawMark,
+} from "./footage";
 import { boundaryOf } from "./multipart";
 import { address, asServerError, ServerError, type Server } from "./server";
-
-/** Event: a recording on disk. Alert and pos: a mark reported by analytics or a POS terminal, with the recordings of its span. */
-export type FootageKind = "event" | "alert" | "pos";
-
-export interface FootageRef {
-  kind: FootageKind;
-  id: number;
-}
-
-export function isSameFootage(one: FootageRef, other: FootageRef | null | undefined): boolean {
-  return one.kind === other?.kind && one.id === other.id;
-}
-
-/** What a mark says and who says so, and why it is kept, a line each; empty for a recording that is not kept. */
-export function describe({ text, reporter, isKept, note, keeper }: Footage): string {
-  const kept = isKept && `Kept${keeper && ` by ${keeper}`}${note && `: ${note}`}`;
-  return [text, reporter && `Reported by ${reporter}`, kept].filter(Boolean).join("\n");
-}
-
-/** Something that can be played. */
-export interface Footage extends FootageRef {
-  camera: number;
-  /** Unix seconds. */
-  start: number;
-  /** Of a growing recording, how far it can be played now. */
-  stop: number;
-  /** When a mark's event happened; its footage begins before. */
-  moment: number;
-  /** 0 where the server does not say. */
-  frameCount: number;
-  isGrowing: boolean;
-  /** The server's number for why it was recorded; 0 for marks. */
-  reason: number;
-  /** Of a mark, else empty. */
-  text: string;
-  /** The account that reported a mark; empty where nobody is named. */
-  reporter: string;
-  /** There is something to play. */
-  isSaved: boolean;
-  /** Retention leaves it alone. Of a mark known only where it was looked up by itself. */
-  isKept: boolean;
-  /** Why it is kept, and who says so; empty where that is not known. */
-  note: string;
-  keeper: string;
-}
-
-/** What the user tells apart: recordings by their reason, and marks. */
-export type EventKind = "continuous" | "alarm" | Exclude<FootageKind, "event">;
 
 /** Run lengths of steps, by value: 0 nothing, 1 recorded, 2 an event. */
 export type Runs = [value: number, count: number][];
@@ -93,32 +56,6 @@ export interface FrameOfTime {
 
 /** How far a stream goes: one frame, all there is, or on with what is still being recorded. */
 export type Extent = "one" | "all" | "growing";
-
-interface RawEvent {
-  id: number;
-  start: number;
-  stop: number;
-  frame_count: number;
-  record_type: number;
-  is_recording: boolean;
-  archived?: boolean;
-  note?: string;
-  kept_by?: string;
-}
-
-interface RawMark {
-  id: number;
-  kind: "alert" | "pos";
-  camera_id: number;
-  time: number;
-  start: number;
-  stop: number;
-  /** Pending: the footage is not complete yet; missed: there is none. */
-  state: "pending" | "saved" | "missed";
-  reported_by: string;
-  text: string[];
-  archived?: boolean;
-}
 
 interface RawHistory {
   camera: {
@@ -273,46 +210,4 @@ export class Recordings {
   async setRate(key: number, rate: number): Promise<void> {
     await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
   }
-}
-
-function footageOf(raw: RawEvent, camera: number): Footage {
-  return {
-    kind: "event",
-    id: raw.id,
-    camera,
-    start: raw.start,
-    stop: raw.stop,
-    moment: raw.start,
-    frameCount: raw.frame_count,
-    isGrowing: raw.is_recording,
-    reason: raw.record_type,
-    text: "",
-    reporter: "",
-    isSaved: true,
-    isKept: raw.archived ?? false,
-    note: raw.note ?? "",
-    keeper: raw.kept_by ?? "",
-  };
-}
-
-function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, text, archived }: RawMark): Footage {
-  const unknown = { frameCount: 0, isGrowing: false, reason: 0, note: "", keeper: "" };
-  return {
-    id,
-    kind,
-    camera: camera_id,
-    start,
-    stop,
-    moment: time,
-    text: text.join("\n"),
-    reporter: reported_by,
-    isSaved: state === "saved",
-    isKept: archived ?? false,
-    ...unknown,
-  };
-}
-
-/** The server takes no kind for a recorded event. */
-export function kindParameter(kind: FootageKind): Record<string, string> {
-  return kind === "event" ? {} : { kind };
 }

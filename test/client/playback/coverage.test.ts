@@ -3,7 +3,8 @@
 // Segments out of the recording log's run lengths.
 
 import { segmentsOf, overlapping } from "../../../client/src/playback/coverage";
-import type { Footage, Runs } from "../../../client/src/wire/recordings";
+import type { Footage } from "../../../client/src/wire/footage";
+import type { Runs } from "../../../client/src/wire/recordings";
 
 test.each<[string, Runs, [number, number, boolean][]]>([
   ["holes are left out", [[0, 2], [1, 3], [0, 1], [2, 1]], [[110, 125, false], [130, 135, true]]],

@@ -3,7 +3,8 @@
 // A player against a server of its own.
 
 import { Player } from "../../../client/src/playback/player";
-import { Recordings, type Footage } from "../../../client/src/wire/recordings";
+import type { Footage } from "../../../client/src/wire/footage";
+import { Recordings } from "../../../client/src/wire/recordings";
 import { Server } from "../../../client/src/wire/server";
 import { FakeArchive } from "../support/fake_archive";
 

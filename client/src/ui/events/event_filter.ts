@@ -2,7 +2,8 @@
 //
 // Which cameras and which kinds of events the timeline and the list show; kept for the next visit.
 
-import { kEventKinds, type EventKind } from "../../playback/coverage";
+import { kEventKinds, kindOf, type EventKind } from "../../playback/coverage";
+import type { Footage } from "../../wire/footage";
 import type { Group } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
@@ -59,9 +60,9 @@ export class EventFilter {
     return this.#kinds;
   }
 
-  /** The list shows kept recordings alone. */
-  get isKeptOnly(): boolean {
-    return this.#isKeptOnly;
+  /** Whether the list shows it, if it is of one of the cameras. */
+  admits(footage: Footage): boolean {
+    return this.#kinds.has(kindOf(footage)) && (footage.isKept || !this.#isKeptOnly);
   }
 
   setCameras(cameras: readonly Camera[]): void {

@@ -3,7 +3,7 @@
 // The events and marks of a span as cards with a picture each, newest first; only those on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
-import { describe, isSameFootage, type Footage, type FootageRef } from "../../wire/recordings";
+import { describe, isSameFootage, type Footage, type FootageRef } from "../../wire/footage";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { clockTime, duration, minuteText, shortDate } from "../widgets/text";

@@ -3,7 +3,7 @@
 // Chooses what to take away as a file: a span and cameras. Says how long and how large that is, and what is missing.
 
 import type { ExportPlan, Exports } from "../../wire/exports";
-import type { Footage } from "../../wire/recordings";
+import type { Footage } from "../../wire/footage";
 import { ServerError, type Camera } from "../../wire/server";
 import type { Span } from "../timeline/span_handles";
 import { bytesText } from "../widgets/amounts";

@@ -3,7 +3,8 @@
 // The padlock at the player: says whether what plays is kept, why and by whom, and lets a manager change it.
 
 import type { Exports } from "../../wire/exports";
-import { isSameFootage, type Footage, type Recordings } from "../../wire/recordings";
+import { isSameFootage, type Footage } from "../../wire/footage";
+import type { Recordings } from "../../wire/recordings";
 import { asServerError, ServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";

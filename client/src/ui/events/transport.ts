@@ -6,7 +6,7 @@ import type { EventWalk } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
 import type { SyncPlayback } from "../../playback/sync_playback";
 import { downloadAddress } from "../../wire/exports";
-import type { Footage } from "../../wire/recordings";
+import type { Footage } from "../../wire/footage";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";

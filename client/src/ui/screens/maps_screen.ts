@@ -183,8 +183,8 @@ export class MapsScreen extends Screen {
 
   #showStates(): void {
     for (const view of this.#view.views) {
-      const isOff = view.item.kind === "camera" && view.item.port < 0 && !this.#cameraOf(view);
-      view.state = isOff ? "switched off" : (this.#stateOf(view)?.state ?? "");
+      const isDisabled = view.item.kind === "camera" && view.item.port < 0 && !this.#cameraOf(view);
+      view.state = isDisabled ? "disabled" : (this.#stateOf(view)?.state ?? "");
     }
   }
 
@@ -220,7 +220,7 @@ export class MapsScreen extends Screen {
     if (item.kind === "emap") return showMap(item.id);
     const camera = this.#cameraOf(view);
     if (item.kind === "camera" && item.port < 0) {
-      return camera ? showMap(map, camera) : notify(`${item.name} is switched off.`);
+      return camera ? showMap(map, camera) : notify(`${item.name} is disabled.`);
     }
     const open = camera && (() => showMap(map, camera));
     this.#card.show(view, camera, this.#stateOf(view)?.since ?? 0, open);

@@ -9,7 +9,7 @@
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
 
-import type { FootageRef } from "../../wire/recordings";
+import type { FootageRef } from "../../wire/footage";
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";

@@ -19,20 +19,24 @@ export interface Revised {
   revision: number;
 }
 
+/** The fields of a form, and all that they hold as one value. */
+export interface FormFields<Settings> {
+  readonly content: readonly HTMLElement[];
+  value: Settings;
+  /** Fields that are never shown, such as passwords, hold something. */
+  readonly hasSecrets: boolean;
+  /** A sentence where the form cannot be saved as it is. */
+  problem(settings: Settings): string;
+}
+
 export interface RecordFormParts<Settings extends object, Stored extends Revised> {
-  content: HTMLElement[];
+  fields: FormFields<Settings>;
   /** The record, or null for a new one, whose form begins with `initial`. */
   stored: Stored | null;
   initial: Settings;
   settingsOf(stored: Stored): Settings;
-  read(): Settings;
-  show(settings: Settings): void;
-  /** Fields that are never shown, such as passwords, hold something. */
-  hasSecrets(): boolean;
   /** Stores `settings`, made from `base`; null: the user has changed their mind. Rejects with a ServerError. */
   save(settings: Settings, base: Stored | null): Promise<Stored | null>;
-  /** A sentence where the form cannot be saved as it is. */
-  problem(settings: Settings): string;
   describe: Descriptions<Settings>;
   onSaved(stored: Stored): void;
   /** "camera" */
@@ -44,6 +48,7 @@ export interface RecordFormParts<Settings extends object, Stored extends Revised
 export class RecordForm<Settings extends object, Stored extends Revised> {
   readonly root: HTMLFormElement;
   readonly #parts: RecordFormParts<Settings, Stored>;
+  readonly #fields: FormFields<Settings>;
   readonly #message = element("p", { class: "form-message", role: "alert" });
   readonly #submit: HTMLButtonElement;
   readonly #conflict = element("div", { class: "form-conflict-place" });
@@ -53,56 +58,57 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
 
   constructor(parts: RecordFormParts<Settings, Stored>, draft: Draft | null) {
     this.#parts = parts;
+    this.#fields = parts.fields;
     this.#base = parts.stored;
     this.#initial = parts.stored ? parts.settingsOf(parts.stored) : parts.initial;
     this.#submit = element("button", { type: "submit", class: "button primary" }, parts.submit);
     const buttons = element("div", { class: "form-buttons" }, this.#submit, button("Cancel", parts.leave), this.#message);
-    this.root = element("form", { class: "form", novalidate: true }, ...parts.content, this.#conflict, buttons);
+    this.root = element("form", { class: "form", novalidate: true }, ...parts.fields.content, this.#conflict, buttons);
     this.root.addEventListener("submit", (event) => {
       event.preventDefault();
       void this.#save();
     });
     this.root.addEventListener("input", () => (this.#message.textContent = ""));
-    parts.show(this.#initial);
+    this.#fields.value = this.#initial;
     // A field may show less than was stored, such as fewer digits.
-    this.#initial = parts.read();
+    this.#initial = this.#fields.value;
     if (draft) this.#restore(draft);
   }
 
   get isChanged(): boolean {
-    return this.#parts.hasSecrets() || !isSame(this.#parts.read(), this.#initial);
+    return this.#fields.hasSecrets || !isSame(this.#fields.value, this.#initial);
   }
 
   get draft(): Draft | null {
-    return this.isChanged ? { settings: this.#parts.read(), base: this.#base } : null;
+    return this.isChanged ? { settings: this.#fields.value, base: this.#base } : null;
   }
 
   #restore({ settings, base }: Draft): void {
     if (base) {
       this.#base = base as Stored;
-      this.#parts.show(this.#parts.settingsOf(this.#base));
-      this.#initial = this.#parts.read();
+      this.#fields.value = this.#parts.settingsOf(this.#base);
+      this.#initial = this.#fields.value;
     }
-    this.#parts.show(settings as Settings);
+    this.#fields.value = settings as Settings;
     this.#message.textContent =
       "Your changes from before the session ended are here. They are not saved yet; passwords must be typed again.";
   }
 
   async #save(): Promise<void> {
     if (this.#submit.getAttribute("aria-busy") === "true") return;
-    const settings = this.#parts.read();
+    const settings = this.#fields.value;
     const invalid = [...this.root.elements].find((field) => field instanceof HTMLInputElement && !field.validity.valid);
-    const problem = this.#parts.problem(settings) || (invalid ? "Please check the marked field." : "");
+    const problem = this.#fields.problem(settings) || (invalid ? "Please check the marked field." : "");
     this.#message.textContent = problem;
     if (problem) return void (invalid as HTMLElement | undefined)?.focus();
     this.#submit.setAttribute("aria-busy", "true");
     try {
       const stored = await this.#parts.save(settings, this.#base);
       if (!stored) return;
-      const typed = this.#parts.read();
+      const typed = this.#fields.value;
       this.#take(stored);
       // The server may have been slow.
-      if (!isSame(typed, settings)) this.#parts.show(merged(settings, typed, this.#initial));
+      if (!isSame(typed, settings)) this.#fields.value = merged(settings, typed, this.#initial);
       this.#parts.onSaved(stored);
     } catch (error) {
       const { status, data, message } = asServerError(error);
@@ -115,19 +121,19 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
 
   #take(stored: Stored): void {
     this.#base = stored;
-    this.#parts.show(this.#parts.settingsOf(stored));
-    this.#initial = this.#parts.read();
+    this.#fields.value = this.#parts.settingsOf(stored);
+    this.#initial = this.#fields.value;
     this.#conflict.replaceChildren();
   }
 
   #showConflict(theirs: Stored): void {
-    const mine = this.#parts.read();
+    const mine = this.#fields.value;
     const now = this.#parts.settingsOf(theirs);
     const panel = conflictPanel(this.#parts.noun, this.#initial, mine, now, this.#parts.describe, {
       keepMine: () => {
-        const both = merged(this.#initial, this.#parts.read(), now);
+        const both = merged(this.#initial, this.#fields.value, now);
         this.#take(theirs);
-        this.#parts.show(both);
+        this.#fields.value = both;
         void this.#save();
       },
       takeTheirs: () => this.#take(theirs),

@@ -6,8 +6,9 @@
 import { kindOf, type EventKind } from "../../playback/coverage";
 import type { FootageCache } from "../../playback/footage_cache";
 import { midnight, type RecordedDays } from "../../playback/recorded_days";
-import { describe, type Footage, type FootageRef } from "../../wire/recordings";
+import { describe, type Footage, type FootageRef } from "../../wire/footage";
 import { element } from "../widgets/dom";
+import { OncePerFrame } from "../widgets/once_per_frame";
 import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 import { SpanHandles, type Span } from "./span_handles";
@@ -68,13 +69,13 @@ export class Timeline {
   readonly #handles = new SpanHandles(this.#drawn, (span) => this.#actions.choose(span));
   readonly #pointers: PanZoomPointers;
   readonly #resized = new ResizeObserver(() => this.#resize());
+  readonly #drawing = new OncePerFrame(() => this.#draw());
   #colours: Colours | null = null;
   #scale = TimeScale.of(Date.now() - kStartSpanMs, Date.now() + kStartSpanMs * kAhead, 1000);
   #lanes: readonly Lane[] = [];
   #kinds: ReadonlySet<EventKind> = new Set();
   #playheadMs: number | null = null;
   #selected: FootageRef | null = null;
-  #animationFrame = 0;
   #isScrubbing = false;
 
   constructor(cache: FootageCache, days: RecordedDays, actions: TimelineActions) {
@@ -167,15 +168,12 @@ export class Timeline {
   }
 
   redraw(): void {
-    this.#animationFrame ||= requestAnimationFrame(() => {
-      this.#animationFrame = 0;
-      this.#draw();
-    });
+    this.#drawing.request();
   }
 
   close(): void {
     this.#resized.disconnect();
-    cancelAnimationFrame(this.#animationFrame);
+    this.#drawing.cancel();
   }
 
   #zoomCentre(): number {

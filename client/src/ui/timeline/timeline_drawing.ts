@@ -7,7 +7,7 @@
 
 import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
 import { midnights } from "../../playback/recorded_days";
-import type { Footage, FootageRef } from "../../wire/recordings";
+import type { Footage, FootageRef } from "../../wire/footage";
 import type { TimeScale } from "./time_scale";
 
 export const kAxisPx = 26;

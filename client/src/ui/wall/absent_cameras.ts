@@ -35,10 +35,10 @@ export class AbsentCameras {
   }
 }
 
-/** The server names no camera that is not there; but it counts those that are switched off. */
+/** The server names no camera that is not there; but it counts those that are disabled. */
 function reasonFor(before: CameraList, now: CameraList, left: number): string {
   const gone = before.CamNum - now.CamNum;
-  if (gone <= 0) return "Switched off";
-  if (gone < left) return "Switched off or removed";
+  if (gone <= 0) return "Disabled";
+  if (gone < left) return "Disabled or removed";
   return now.isManager ? "Removed" : "Removed, or denied to you";
 }

@@ -59,6 +59,10 @@ export function spanInWords(seconds: number): string {
   return minutes > 0 ? `${minutes} min` : `${Math.round(seconds)} s`;
 }
 
+export function yesNo(value: boolean): string {
+  return value ? "yes" : "no";
+}
+
 /** "½×" for slow motion by a factor of two, "4×" for four times as fast. */
 export function rateText(rate: number): string {
   const slow: Record<number, string> = { [-2]: "½", [-4]: "¼", [-8]: "⅛" };

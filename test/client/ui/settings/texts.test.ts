@@ -4,7 +4,7 @@
 
 import { actionText, changesOf } from "../../../../client/src/ui/settings/audit/audit_text";
 import { addressProblem, withPath } from "../../../../client/src/ui/settings/cameras/address";
-import { painted, weekText } from "../../../../client/src/ui/settings/cameras/plan";
+import { kFirstPlan, painted, recordedText, weekText } from "../../../../client/src/ui/settings/cameras/plan";
 import { differences, isSame, merged } from "../../../../client/src/ui/settings/merge";
 import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/accounts/rights";
 import { limitsEffect } from "../../../../client/src/ui/settings/storage/storage_text";
@@ -21,6 +21,16 @@ test("a stroke paints the rectangle between two hours, in whatever direction it 
   }
   expect(weekText(painted(painted(never, 0, 9, 1), 24, 25, 2))).toBe("each week 10 h always, 2 h on alarm");
   expect(weekText(never)).toBe("not recorded");
+});
+
+test.each([
+  [{ mode: "always" }, "recorded always"],
+  [{ mode: "never" }, "recorded on alarm only"],
+  [{ mode: "schedule", hours: painted(never, 0, 9, 1) }, "recorded each week 10 h always"],
+  [{ mode: "schedule", hours: never }, "not recorded"],
+  [{ mode: "always", enabled: false }, "not recorded"],
+] as const)("the list says of a camera with %o: %s", (changed, expected) => {
+  expect(recordedText({ enabled: true, ...changed, plan: { ...kFirstPlan, ...changed } })).toBe(expected);
 });
 
 test.each([

@@ -3,6 +3,7 @@
 // Entries of the audit log in words.
 
 import type { AuditedState, AuditEntry } from "../../../wire/audit";
+import { yesNo } from "../../widgets/text";
 import { weekText } from "../cameras/plan";
 
 /** Where the user knows it by another name. */
@@ -52,7 +53,7 @@ function flat(state: AuditedState | null, prefix = ""): Map<string, string> {
 }
 
 function textOf(value: unknown): string {
-  if (typeof value === "boolean") return value ? "yes" : "no";
+  if (typeof value === "boolean") return yesNo(value);
   if (value === null || value === undefined) return "";
   if (Array.isArray(value)) return value.map(textOf).join(", ");
   if (typeof value !== "object") return String(value);

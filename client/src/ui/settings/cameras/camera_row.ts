@@ -9,14 +9,14 @@ import { settingsAddress } from "../../screens/route";
 import { bytesText } from "../../widgets/amounts";
 import { draw, element, setText } from "../../widgets/dom";
 import { minuteText } from "../../widgets/text";
-import { planText } from "./plan";
+import { recordedText } from "./plan";
 import { codecText, rateNumber } from "./probe_panel";
 
 const kPictureWidthPx = 320;
 const kStates: Record<Exclude<CameraRecord["state"], "no-signal">, string> = {
   running: "live",
   connecting: "connecting",
-  off: "switched off",
+  disabled: "disabled",
   idle: "standing by",
   unknown: "unknown: the recorder does not run",
 };
@@ -75,7 +75,7 @@ export class CameraRow {
 
   show(camera: CameraRecord, groups: readonly Named[]): void {
     this.#camera = camera;
-    const { name, enabled, state, codec, rate, bytes, plan, footage } = camera;
+    const { name, state, codec, rate, bytes, footage } = camera;
     const trouble = recordingTrouble(camera.recording);
     this.root.dataset.state = state === "running" ? "live" : state === "no-signal" ? "lost" : state;
     this.root.classList.toggle("has-trouble", trouble !== "");
@@ -85,7 +85,7 @@ export class CameraRow {
     setText(this.#state, stateText(camera));
     const flow = state === "running" ? [`${rateNumber(rate)} fps`, `${bytesText(bytes)}/s`] : [];
     setText(this.#sends, [codecText(codec), ...flow].join(" · "));
-    setText(this.#plan, trouble || (enabled ? planText(plan) : "not recorded"));
+    setText(this.#plan, trouble || recordedText(camera));
     if (footage) setText(this.#footage, footage.bytes > 0 ? `${bytesText(footage.bytes)} of footage` : "no footage");
   }
 

@@ -2,7 +2,7 @@
 //
 // When a camera records: the hours of a week, and the plan in words.
 
-import type { RecordingPlan } from "../../../wire/camera_setup";
+import type { CameraSettings, Named, RecordingPlan } from "../../../wire/camera_setup";
 import { duration } from "../../widgets/text";
 
 export const kDays = ["Monday", "Tuesday", "Wednesday", "Thursday", "Friday", "Saturday", "Sunday"] as const;
@@ -41,12 +41,14 @@ export function painted(hours: string, from: number, to: number, mode: number): 
     .join("");
 }
 
+const kNotRecorded = "not recorded";
+
 /** "always", "not recorded", "each week 98 h always, 70 h on alarm". */
 export function weekText(hours: string): string {
   const count = (mode: number) => [...hours].filter((hour) => Number(hour) === mode).length;
   const counts = kHourModes.map((text, mode) => ({ text, count: count(mode) }));
   const used = counts.filter(({ text, count }) => count > 0 && text !== "never");
-  if (used.length === 0) return "not recorded";
+  if (used.length === 0) return kNotRecorded;
   if (used[0]!.count === kHoursOfWeek) return used[0]!.text;
   return `each week ${used.map(({ text, count }) => `${count} h ${text}`).join(", ")}`;
 }
@@ -58,10 +60,19 @@ export function hourText(at: number): string {
   return `${kDays[Math.floor(at / kHoursOfDay)]}, ${two(hour)} to ${two(hour + 1)}`;
 }
 
-/** Without `mounts`, in few words. */
-export function planText(plan: RecordingPlan, mounts?: readonly { id: number; name: string }[]): string {
-  const when = { never: "on alarm only", always: "always", schedule: weekText(plan.hours) }[plan.mode];
-  if (!mounts) return when;
+function whenText({ mode, hours }: RecordingPlan): string {
+  return { never: "on alarm only", always: "always", schedule: weekText(hours) }[mode];
+}
+
+/** "recorded always", "recorded on alarm only", "not recorded". */
+export function recordedText({ enabled, plan }: Pick<CameraSettings, "enabled" | "plan">): string {
+  const when = enabled ? whenText(plan) : kNotRecorded;
+  return when === kNotRecorded ? when : `recorded ${when}`;
+}
+
+/** The whole plan. */
+export function planText(plan: RecordingPlan, mounts: readonly Named[]): string {
+  const when = whenText(plan);
   const hasAlarms = plan.mode === "never" || (plan.mode === "schedule" && plan.hours.includes("2"));
   const alarms = hasAlarms ? `, ${plan.pre} s before and ${plan.post} s after an alarm` : "";
   const mount = mounts.find(({ id }) => id === plan.mount)?.name ?? "the default mount";

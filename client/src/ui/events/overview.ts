@@ -1,0 +1,144 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What was recorded when, of the cameras that the user has chosen: filter, calendar, timeline and list, filled from one cache.
+
+import { FootageCache } from "../../playback/footage_cache";
+import { RecordedDays } from "../../playback/recorded_days";
+import type { Footage } from "../../wire/footage";
+import type { Recordings } from "../../wire/recordings";
+import type { Camera } from "../../wire/server";
+import { spanText } from "../timeline/time_scale";
+import { Timeline, type TimelineActions } from "../timeline/timeline";
+import { Calendar } from "./calendar";
+import { EventFilter } from "./event_filter";
+import { EventList } from "./event_list";
+import { listEvents, whyNoEvents } from "./event_listing";
+
+const kSettleMs = 150;
+
+export interface OverviewActions extends TimelineActions {
+  /** Other cameras or kinds of events were chosen. */
+  filtered(): void;
+  dayPicked(): void;
+}
+
+export class Overview {
+  readonly cache: FootageCache;
+  readonly filter: EventFilter;
+  readonly list: EventList;
+  readonly timeline: Timeline;
+  readonly calendar: Calendar;
+  readonly #days: RecordedDays;
+  readonly #actions: OverviewActions;
+  #cameras: readonly Camera[] = [];
+  #settling: ReturnType<typeof setTimeout> | undefined;
+
+  constructor(recordings: Recordings, actions: OverviewActions) {
+    this.#actions = actions;
+    this.cache = new FootageCache(recordings, () => this.#showFootage());
+    this.#days = new RecordedDays(recordings, () => this.#showDays());
+    this.filter = new EventFilter(() => actions.filtered());
+    this.list = new EventList(
+      (camera) => this.nameOf(camera),
+      (footage, widthPx) => recordings.stillAddress(footage, widthPx),
+      (footage) => actions.open(footage),
+    );
+    this.timeline = new Timeline(this.cache, this.#days, { ...actions, moved: () => this.#onMoved() });
+    this.calendar = new Calendar(this.#days, () => this.#chosen, (dayMs) => this.#pickDay(dayMs));
+  }
+
+  /** All that there are; of these the user chooses. */
+  set cameras(cameras: readonly Camera[]) {
+    this.#cameras = cameras;
+    this.filter.setCameras(cameras);
+    this.filter.setGroups([]);
+  }
+
+  get cameras(): readonly Camera[] {
+    return this.#cameras;
+  }
+
+  nameOf(camera: number): string {
+    return this.#cameras.find(({ id }) => id === camera)?.name ?? `Camera ${camera}`;
+  }
+
+  /** Shows a lane for each camera that is chosen. */
+  showLanes(onStage: readonly number[]): void {
+    this.timeline.setKinds(this.filter.kinds);
+    this.timeline.setLanes(this.filter.cameras.map(({ id, name }) => ({ camera: id, name })), onStage);
+    // On a phone the timeline may be out of sight, and then tells of no span that has to be loaded.
+    this.reload();
+  }
+
+  /** Brings the footage, of which that time is played, into sight. */
+  reveal(footage: Footage, atMs: number): void {
+    this.filter.include(footage.camera);
+    this.timeline.reveal(atMs);
+  }
+
+  showPlayback(footage: Footage | null, playheadMs: number | null, isPlaying: boolean): void {
+    this.timeline.setPlayhead(playheadMs, footage, isPlaying);
+    this.calendar.mark(footage && playheadMs);
+    this.list.select(footage);
+  }
+
+  /** Loads what the timeline shows now, and what has been recorded since. */
+  reload(): void {
+    if (document.hidden || this.#cameras.length === 0) return;
+    const { startMs, endMs } = this.timeline.scale;
+    if (!this.timeline.showsEvents) this.#days.load(this.#chosen, startMs, endMs);
+    else void this.cache.load(this.#chosen, startMs / 1000, endMs / 1000, true);
+    // Asks again for days that the server did not answer for.
+    this.calendar.refresh();
+    this.#showFootage();
+  }
+
+  /** Whether a day has recordings is asked anew: retention deletes them. */
+  forgetDays(): void {
+    this.#days.clear();
+  }
+
+  close(): void {
+    clearTimeout(this.#settling);
+    this.timeline.close();
+    this.list.close();
+  }
+
+  get #chosen(): number[] {
+    return this.filter.cameras.map(({ id }) => id);
+  }
+
+  #pickDay(dayMs: number): void {
+    this.timeline.showDay(dayMs);
+    this.calendar.select(dayMs);
+    this.#actions.dayPicked();
+  }
+
+  /** Loads what the timeline shows now, but not while it is still being moved. */
+  #onMoved(): void {
+    const { startMs, endMs } = this.timeline.scale;
+    if (this.timeline.showsEvents) this.calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
+    clearTimeout(this.#settling);
+    this.#settling = setTimeout(() => this.reload(), kSettleMs);
+    this.#actions.moved();
+  }
+
+  #showDays(): void {
+    this.calendar.refresh();
+    this.#showFootage();
+  }
+
+  #showFootage(): void {
+    this.timeline.redraw();
+    const { startMs, endMs } = this.timeline.scale;
+    const span = spanText(startMs, Math.min(endMs, Date.now()));
+    if (!this.timeline.showsEvents) return this.list.show([], span, "Show four days or less to list events.");
+    const [fromS, toS] = [startMs / 1000, endMs / 1000];
+    const recorded = this.#chosen
+      .flatMap((camera) => this.cache.get(camera, fromS, toS).footage)
+      .filter((one) => one.stop >= fromS && one.start < toS);
+    const isKnown = this.#cameras.length > 0 && !this.cache.isBusy;
+    const whyNone = isKnown ? whyNoEvents(this.filter, recorded.length, this.calendar) : "";
+    listEvents(this.list, this.filter, recorded, span, whyNone);
+  }
+}
