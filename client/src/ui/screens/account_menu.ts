@@ -10,7 +10,7 @@ import { secretField } from "../widgets/fields";
 import { openDialog } from "../widgets/form_dialog";
 import { icon, type IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";
-import type { Session } from "./screen";
+import type { Session } from "./session";
 
 const kMinPasswordBytes = 8;
 

@@ -25,7 +25,8 @@ import { OncePerFrame } from "../widgets/once_per_frame";
 import { spanInWords } from "../widgets/text";
 import { keepTrying } from "./keep_trying";
 import { openFootage, recordFootage } from "./route";
-import { Screen, type Session } from "./screen";
+import { Screen } from "./screen";
+import type { Session } from "./session";
 
 const kRefreshMs = 250;
 const kReloadIntervalMs = 5_000;

@@ -16,7 +16,8 @@ import { notify } from "../widgets/notice";
 import { titleScreen } from "../widgets/title";
 import { keepTrying } from "./keep_trying";
 import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
-import { Screen, type Kept, type Session } from "./screen";
+import { Screen } from "./screen";
+import type { Kept, Session } from "./session";
 
 const kRefreshMs = 500;
 const kStatesIntervalMs = 3_000;

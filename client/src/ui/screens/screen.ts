@@ -3,10 +3,7 @@
 // What every screen of a logged-in user has: title and heading, the bar with navigation, clock and account, the progress
 // line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may leave.
 
-import type { EditedMap } from "../../wire/emaps";
-import type { Account, Server } from "../../wire/server";
-import type { Draft } from "../settings/record_form";
-import type { AbsentCameras } from "../wall/absent_cameras";
+import type { Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -17,30 +14,10 @@ import { titleScreen } from "../widgets/title";
 import { AccountMenu } from "./account_menu";
 import { navigation } from "./navigation";
 import type { ScreenName } from "./route";
+import type { Session } from "./session";
 
 const kClockMs = 500;
 const kNames: Record<ScreenName, string> = { wall: "Live", events: "Events", maps: "Maps", settings: "Settings" };
-
-/** What the page remembers of an account from one screen or session to the next. */
-export interface Kept {
-  readonly userId: number;
-  readonly absentCameras: AbsentCameras;
-  /** Changes to a map that were not saved when the session ended. */
-  mapDraft: EditedMap | null;
-  /** The same of the settings' page with this address. */
-  settingsDraft: { address: string; draft: Draft } | null;
-  /** The first account was just made, and the steps that follow are not done. */
-  isSettingUp: boolean;
-}
-
-/** What a screen is opened with. */
-export interface Session {
-  readonly server: Server;
-  readonly account: Account;
-  readonly kept: Kept;
-  /** Called when the user has logged out. */
-  readonly onLogOut: () => void;
-}
 
 export abstract class Screen {
   readonly name: ScreenName;

@@ -15,7 +15,8 @@ import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
 import { titleScreen } from "../widgets/title";
 import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "./route";
-import { Screen, type Kept, type Session } from "./screen";
+import { Screen } from "./screen";
+import type { Kept, Session } from "./session";
 import { SetupSteps } from "./setup_steps";
 
 const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {

@@ -15,7 +15,8 @@ import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
 import { keepTrying } from "./keep_trying";
 import { openCamera, showCamera, showWall } from "./route";
-import { Screen, type Session } from "./screen";
+import { Screen } from "./screen";
+import type { Session } from "./session";
 
 const kRefreshMs = 500;
 /** Cameras come and go seldom. */

@@ -2,10 +2,10 @@
 //
 // Says that someone else has changed a record meanwhile, shows both, and lets the user choose whose changes stay.
 
+import { button } from "../widgets/button";
 import { element } from "../widgets/dom";
 import { plainTable } from "../widgets/table";
 import { differences } from "./merge";
-import { button } from "./page";
 
 /** The name of each setting, and its value in words. */
 export type Descriptions<Settings> = {

@@ -7,7 +7,7 @@ import { asServerError, type Account, type Server, type ServerError } from "../.
 import { keepTrying } from "../screens/keep_trying";
 import { element } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
-import type { Draft } from "./record_form";
+import type { Draft } from "./draft";
 
 export interface Page {
   readonly root: HTMLElement;
@@ -115,30 +115,4 @@ export function emptyState(name: IconName, sentence: string, ...actions: Node[])
 
 export function noRightState(): HTMLElement {
   return emptyState("warning", "Only managers of this system may see and change its settings.");
-}
-
-/** A link that looks like a button. */
-export function linkButton(label: string, href: string, isPrimary = false): HTMLElement {
-  return element("a", { class: isPrimary ? "button primary" : "button", href }, label);
-}
-
-export function button(label: string, onClick: (made: HTMLButtonElement) => void, look = ""): HTMLButtonElement {
-  const made = element("button", { type: "button", class: `button ${look}`.trim() }, label);
-  made.addEventListener("click", () => onClick(made));
-  return made;
-}
-
-/** The button takes no clicks until `work` is done, which a second one would begin again. */
-export async function whileBusy<Result>(pressed: HTMLButtonElement, work: Promise<Result>): Promise<Result> {
-  const hadFocus = document.activeElement === pressed;
-  pressed.setAttribute("aria-busy", "true");
-  pressed.disabled = true;
-  try {
-    return await work;
-  } finally {
-    pressed.removeAttribute("aria-busy");
-    pressed.disabled = false;
-    // Disabled buttons lose it.
-    if (hadFocus) pressed.focus();
-  }
 }

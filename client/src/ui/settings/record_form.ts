@@ -4,16 +4,11 @@
 // shows both and lets the user choose.
 
 import { asServerError } from "../../wire/server";
+import { button } from "../widgets/button";
 import { element } from "../widgets/dom";
 import { conflictPanel, type Descriptions } from "./conflict_panel";
+import type { Draft } from "./draft";
 import { isSame, merged } from "./merge";
-import { button } from "./page";
-
-/** What a form held when it was closed, and the record that it was made from. Passwords are not kept. */
-export interface Draft {
-  settings: unknown;
-  base: unknown;
-}
 
 export interface Revised {
   revision: number;

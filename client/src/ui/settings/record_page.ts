@@ -4,11 +4,13 @@
 // Cameras, accounts and mounts differ in their fields, and in how they are saved.
 
 import { settingsAddress, type SettingsSection } from "../screens/route";
+import { button } from "../widgets/button";
 import type { IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";
 import type { Descriptions } from "./conflict_panel";
-import { button, emptyState, LoadedPage, type PageContext } from "./page";
-import { RecordForm, type Draft, type FormFields, type Revised } from "./record_form";
+import type { Draft } from "./draft";
+import { emptyState, LoadedPage, type PageContext } from "./page";
+import { RecordForm, type FormFields, type Revised } from "./record_form";
 
 export interface NamedRecord extends Revised {
   id: number;

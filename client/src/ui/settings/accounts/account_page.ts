@@ -7,6 +7,7 @@
 
 import { People, type UserList, type UserRecord } from "../../../wire/people";
 import { asServerError, type ServerError } from "../../../wire/server";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { openReauthDialog } from "../../widgets/form_dialog";
@@ -14,7 +15,7 @@ import { notify } from "../../widgets/notice";
 import { yesNo } from "../../widgets/text";
 import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
-import { button, type PageContext } from "../page";
+import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
 import { AccountFields, type AccountSettings as Settings } from "./account_fields";
 import { showPreview } from "./preview_dialog";

@@ -5,9 +5,10 @@
 import { People, type UserList, type UserRecord } from "../../../wire/people";
 import { settingsAddress } from "../../screens/route";
 import { counted } from "../../widgets/amounts";
+import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { minuteText } from "../../widgets/text";
-import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
+import { emptyState, LoadedPage, type PageContext } from "../page";
 import { kPrivilegeNames, rightsSummary } from "./rights";
 
 export class AccountsPage extends LoadedPage<UserList> {

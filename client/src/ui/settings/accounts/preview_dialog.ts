@@ -4,11 +4,11 @@
 
 import { kCameraRights, type People, type UserRecord } from "../../../wire/people";
 import { asServerError } from "../../../wire/server";
+import { whileBusy } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { plainTable, scrolled } from "../../widgets/table";
-import { whileBusy } from "../page";
 import { kRightNames } from "./rights";
 
 /** `isChanged`: what is shown is stored, and the form holds something else. `pressed` is busy until there is something to show. */

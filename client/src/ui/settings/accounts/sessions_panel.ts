@@ -5,12 +5,12 @@
 import type { OpenSession, People } from "../../../wire/people";
 import { asServerError } from "../../../wire/server";
 import { counted } from "../../widgets/amounts";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { plainTable, scrolled } from "../../widgets/table";
 import { minuteText } from "../../widgets/text";
-import { button } from "../page";
 
 export class SessionsPanel {
   readonly root = element("div", { class: "form-group" });

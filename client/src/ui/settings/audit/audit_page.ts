@@ -4,11 +4,12 @@
 
 import { auditEntries, type AuditEntry } from "../../../wire/audit";
 import { asServerError } from "../../../wire/server";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";
 import { plainTable, scrolled } from "../../widgets/table";
 import { clockTime, shortDate } from "../../widgets/text";
-import { button, emptyState, LoadedPage, type PageContext } from "../page";
+import { emptyState, LoadedPage, type PageContext } from "../page";
 import { actionText, changesOf } from "./audit_text";
 
 type Entries = Awaited<ReturnType<typeof auditEntries>>;

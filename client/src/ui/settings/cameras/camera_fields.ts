@@ -4,9 +4,9 @@
 // succeeded, or was skipped.
 
 import type { CameraRecord, CameraSettings, CameraSetup, CameraSetupList, ProbeResult } from "../../../wire/camera_setup";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { checkField, chipsField, formPart, selectField, textField, type Field } from "../../widgets/fields";
-import { button } from "../page";
 import type { RecordFields } from "../record_page";
 import { addressProblem } from "./address";
 import { ConnectionFields } from "./connection_fields";

@@ -3,12 +3,13 @@
 // One camera: add it, having seen its picture, or change, disable and remove it.
 
 import { CameraSetup, type CameraRecord, type CameraSettings, type CameraSetupList } from "../../../wire/camera_setup";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { yesNo } from "../../widgets/text";
 import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
-import { button, type PageContext } from "../page";
+import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
 import { CameraFields } from "./camera_fields";
 import { stateText } from "./camera_row";

@@ -6,10 +6,11 @@ import { CameraSetup, type CameraSetupList } from "../../../wire/camera_setup";
 import { Semaphore } from "../../../wire/semaphore";
 import { asServerError } from "../../../wire/server";
 import { settingsAddress } from "../../screens/route";
+import { linkButton } from "../../widgets/button";
 import { element, setText } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";
 import { orderHandle } from "../../widgets/order_list";
-import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
+import { emptyState, LoadedPage, type PageContext } from "../page";
 import { CameraRow } from "./camera_row";
 
 const kStatesIntervalMs = 4_000;

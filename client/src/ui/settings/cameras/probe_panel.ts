@@ -4,9 +4,9 @@
 
 import type { CameraSetup, ProbeRequest, ProbeResult } from "../../../wire/camera_setup";
 import { asServerError } from "../../../wire/server";
+import { button } from "../../widgets/button";
 import { draw, element } from "../../widgets/dom";
 import { icon } from "../../widgets/icons";
-import { button } from "../page";
 
 const kTickMs = 1_000;
 const kCodecs: Record<string, string> = { mjpeg: "MJPEG", h264: "H.264", h265: "H.265" };

@@ -5,12 +5,12 @@
 import type { CameraSetup } from "../../../wire/camera_setup";
 import { asServerError } from "../../../wire/server";
 import { bytesText, counted } from "../../widgets/amounts";
+import { whileBusy } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { radioField } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { minuteText } from "../../widgets/text";
-import { whileBusy } from "../page";
 
 /**
  * Whether it is removed. What it has is asked for anew, so that the user decides on what is there now; `pressed` is busy until

@@ -5,11 +5,11 @@
 import type { MountRecord } from "../../../wire/mounts";
 import { settingsAddress } from "../../screens/route";
 import { bytesText } from "../../widgets/amounts";
+import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { svgElement } from "../../widgets/svg";
 import { plainTable } from "../../widgets/table";
 import { minuteText } from "../../widgets/text";
-import { linkButton } from "../page";
 import { historyPlot } from "./history_plot";
 import { forecastText, limitText, stateText } from "./storage_text";
 

@@ -4,6 +4,7 @@
 
 import { Mounts, type MountLoss, type MountRecord } from "../../../wire/mounts";
 import { bytesText, counted } from "../../widgets/amounts";
+import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
@@ -11,7 +12,7 @@ import { notify } from "../../widgets/notice";
 import { minuteText, yesNo } from "../../widgets/text";
 import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
-import { button, type PageContext } from "../page";
+import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
 import { MountFields, type MountFormSettings as Settings } from "./mount_fields";
 

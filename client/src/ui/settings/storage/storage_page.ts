@@ -4,8 +4,9 @@
 
 import { Mounts, type MountRecord } from "../../../wire/mounts";
 import { settingsAddress } from "../../screens/route";
+import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
-import { emptyState, linkButton, LoadedPage, type PageContext } from "../page";
+import { emptyState, LoadedPage, type PageContext } from "../page";
 import { mountCard } from "./mount_card";
 
 export class StoragePage extends LoadedPage<MountRecord[]> {
