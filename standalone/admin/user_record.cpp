@@ -2,29 +2,22 @@
 #include "standalone/admin/user_record.h"
 
 #include <algorithm>
-#include <array>
-#include <utility>
 
 #include "standalone/admin/change.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::admin {
 
 namespace {
 
-using store::CameraAccess;
 using store::DeniableItem;
-using store::Privilege;
 
-constexpr std::array<std::pair<const char*, Privilege>, 3> kPrivileges{
-    {{"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}}};
-constexpr std::array<std::pair<const char*, CameraAccess>, 3> kAccess{
-    {{"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}}};
-constexpr std::array<std::pair<const char*, DeniableItem>, 3> kItems{
-    {{"emap", DeniableItem::kEmap}, {"door", DeniableItem::kDoor}, {"ioModule", DeniableItem::kIoModule}}};
+const base::Names<DeniableItem> kItems = {
+    {"emap", DeniableItem::kEmap}, {"door", DeniableItem::kDoor}, {"ioModule", DeniableItem::kIoModule}};
 
 // The ids under the name of each kind.
-template <typename Names, typename Kind>
-void Put(Json::Value& json, const Names& names, const std::map<Kind, std::set<int>>& denied) {
+template <typename Kind>
+void Put(Json::Value& json, const base::Names<Kind>& names, const std::map<Kind, std::set<int>>& denied) {
     for (const auto& [name, kind] : names) {
         Json::Value& ids = json[name] = Json::arrayValue;
         if (const auto found = denied.find(kind); found != denied.end()) {
@@ -50,8 +43,9 @@ std::set<int> IdsFrom(const Json::Value& json, const std::string& name) {
 }
 
 // Takes what the names name out of the object; the rest stays.
-template <typename Names, typename Kind>
-void Take(Json::Value& json, const Names& names, const std::string& prefix, std::map<Kind, std::set<int>>& denied) {
+template <typename Kind>
+void Take(Json::Value& json, const base::Names<Kind>& names, const std::string& prefix,
+          std::map<Kind, std::set<int>>& denied) {
     for (const auto& [name, kind] : names) {
         denied[kind] = IdsFrom(json[name], prefix + name);
         json.removeMember(name);
@@ -70,17 +64,13 @@ void RequireEmpty(const Json::Value& json, const std::string& name) {
     }
 }
 
-const char* NameOf(Privilege privilege) {
-    return std::ranges::find(kPrivileges, privilege, &std::pair<const char*, Privilege>::second)->first;
-}
-
 }  // namespace
 
 Json::Value UserRecord(store::Store& store, const store::User& user) {
     Json::Value json;
     json["id"] = user.id;
     json["name"] = user.name;
-    json["privilege"] = NameOf(user.privilege);
+    json["privilege"] = base::NameOf(store::PrivilegeNames(), user.privilege);
     json["mayMark"] = user.MayMark();
     json["deny"] = ToJson(store::Users(store).FindDenials(user.id));
     json["revision"] = Json::Int64{RevisionOf(json)};
@@ -88,8 +78,8 @@ Json::Value UserRecord(store::Store& store, const store::User& user) {
 }
 
 store::Privilege PrivilegeFrom(const std::string& name) {
-    const auto* const found = std::ranges::find(kPrivileges, name, &std::pair<const char*, Privilege>::first);
-    if (found == kPrivileges.end()) {
+    const auto found = store::PrivilegeNames().find(name);
+    if (found == store::PrivilegeNames().end()) {
         throw store::InvalidRecord("privilege must be owner, manager or viewer");
     }
     return found->second;
@@ -97,8 +87,8 @@ store::Privilege PrivilegeFrom(const std::string& name) {
 
 Json::Value ToJson(const store::Denials& denials) {
     Json::Value json;
-    Put(json, kAccess, denials.cameras);
-    Put(json["group"], kAccess, denials.groups);
+    Put(json, store::CameraAccessNames(), denials.cameras);
+    Put(json["group"], store::CameraAccessNames(), denials.groups);
     Put(json, kItems, denials.items);
     return json;
 }
@@ -110,8 +100,8 @@ store::Denials DenialsFrom(const Json::Value& json) {
     RequireObject(group, "deny.group");
     rest.removeMember("group");
     store::Denials denials;
-    Take(rest, kAccess, "", denials.cameras);
-    Take(group, kAccess, "group.", denials.groups);
+    Take(rest, store::CameraAccessNames(), "", denials.cameras);
+    Take(group, store::CameraAccessNames(), "group.", denials.groups);
     Take(rest, kItems, "", denials.items);
     RequireEmpty(rest, "deny");
     RequireEmpty(group, "deny.group");

@@ -5,6 +5,7 @@
 #include <map>
 
 #include "standalone/store/kept_events.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
 
@@ -31,7 +32,7 @@ void AddKeeping(Json::Value& json, const store::Keeping& keeping) {
 Json::Value Describe(const store::Mark& mark) {
     Json::Value json;
     json["id"] = mark.id;
-    json["kind"] = mark.kind == store::MarkKind::kAlert ? "alert" : "pos";
+    json["kind"] = base::NameOf(store::MarkKindNames(), mark.kind);
     json["camera_id"] = mark.camera_id;
     json["time"] = Json::Int64{mark.moment_s};
     json["start"] = Json::Int64{mark.start_s};

@@ -6,6 +6,7 @@
 #include "standalone/binding/rights.h"
 #include "standalone/control/flush_request.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
 
@@ -47,10 +48,12 @@ std::optional<store::MarkKind> KindOf(const Call& call) {
     if (kind.isNull()) {
         return std::nullopt;
     }
-    if (kind == "alert" || kind == "pos") {
-        return kind == "alert" ? store::MarkKind::kAlert : store::MarkKind::kPos;
+    const auto& names = store::MarkKindNames();
+    const auto found = kind.isString() ? names.find(kind.asString()) : names.end();
+    if (found == names.end()) {
+        throw Failure(400, "kind must be alert or pos");
     }
-    throw Failure(400, "kind must be alert or pos");
+    return found->second;
 }
 
 Footage RequireFootage(const Call& call) {

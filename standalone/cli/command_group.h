@@ -7,7 +7,6 @@
 #pragma once
 
 #include <functional>
-#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -15,24 +14,14 @@
 
 #include <CLI/CLI.hpp>
 
+#include "standalone/base/names.h"
 #include "standalone/cli/console.h"
 
 namespace lookhaven::cli {
 
 // The values of an option by what is written on the command line.
-template <typename T>
-using Names = std::map<std::string, T>;
-
-// The name of a value as JSON has it; its number when it has no name.
-template <typename T>
-std::string NameOf(const Names<T>& names, int value) {
-    for (const auto& [name, each] : names) {
-        if (static_cast<int>(each) == value) {
-            return name;
-        }
-    }
-    return std::to_string(value);
-}
+using base::NameOf;
+using base::Names;
 
 // Constraints on an option: any number of them follow its description.
 inline void Required(CLI::Option& option) {

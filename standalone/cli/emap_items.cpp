@@ -92,7 +92,7 @@ void Remove(const Console& console, const Request& request) {
 
 constexpr Column kColumns[] = {
     {"item", "item"},
-    {"type", "type", [](const Json::Value& type) { return NameOf(kTypes, type.asInt()); }},
+    {"type", "type", [](const Json::Value& type) { return NameOf(kTypes, static_cast<EmapItemType>(type.asInt())); }},
     {"id", "id"},
     {"server", "hxId", TextUnlessZero},
     {"port", "portIdx", [](const Json::Value& port) { return port.asInt() < 0 ? "" : PlainText(port); }},

@@ -20,6 +20,7 @@
 #include "standalone/store/groups.h"
 #include "standalone/store/kept_events.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
@@ -33,7 +34,6 @@ using store::Marks;
 using store::MarkState;
 
 const Names<int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
-const Names<MarkKind> kMarkKinds = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
 const Names<int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", base::kReasonAlarm}};
 
 struct Request {
@@ -116,7 +116,7 @@ struct Found {
 
 Found RequireEvent(store::Store& store, int id) {
     Found found{Events(store).Find(id), std::nullopt};
-    for (const auto& [name, kind] : kMarkKinds) {
+    for (const auto& [name, kind] : store::MarkKindNames()) {
         found.mark = found.event || found.mark ? found.mark : Marks(store).Find(kind, id);
     }
     if (!found.event && !found.mark) {
@@ -285,7 +285,7 @@ void AddEvent(CLI::App& program, const Console& console) {
     group.Add("release", "No longer keeps it beyond them", Release).Option("id", request.id, id, Required);
     group.Add("mark", "Reports an alert or POS transaction, whose footage is kept together", AddMark)
         .Option("camera", request.camera, "The camera's id", Required)
-        .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(kMarkKinds))
+        .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(store::MarkKindNames()))
         .Option("--at", request.at, "When it happened (default: now)")
         .Option("--length", request.length, "How long it took, such as 30s (default: 0)")
         .Option("--text", request.text, "A line of text; may be repeated", Repeatable);

@@ -6,6 +6,7 @@
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
@@ -67,10 +68,10 @@ Json::Value ToData(const store::Event& event) {
 }
 
 Json::Value ToData(const store::Mark& mark) {
-    return Object("kind", mark.kind == store::MarkKind::kAlert ? "alert" : "pos", "id", mark.id, "camera_id",
-                  mark.camera_id, "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text", mark.text,
-                  "state", NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo,
-                  "reported_by", mark.reporter.name, "reported", mark.reported_s);
+    return Object("kind", NameOf(store::MarkKindNames(), mark.kind), "id", mark.id, "camera_id", mark.camera_id,
+                  "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text", mark.text, "state",
+                  NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo, "reported_by",
+                  mark.reporter.name, "reported", mark.reported_s);
 }
 
 std::string EventTable(const Json::Value& events) {

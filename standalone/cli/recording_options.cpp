@@ -8,15 +8,11 @@
 #include "standalone/base/local_time.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/units.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
 namespace {
-
-using store::RecordMode;
-
-const Names<RecordMode> kModes = {
-    {"always", RecordMode::kAlways}, {"never", RecordMode::kNever}, {"schedule", RecordMode::kSchedule}};
 
 // The store refuses what is too long, with the limit in its message.
 void AssignSeconds(int& target, const std::optional<std::string>& given) {
@@ -28,7 +24,7 @@ void AssignSeconds(int& target, const std::optional<std::string>& given) {
 }  // namespace
 
 void RecordingOptions::AddTo(Command& command) {
-    command.Option("--record", mode_, "When it is recorded (initially never)", OneOf(kModes))
+    command.Option("--record", mode_, "When it is recorded (initially never)", OneOf(store::RecordModeNames()))
         .Option("--segment", segment_, "Length of a recorded event, 10s to 60m (initially 5m)")
         .Option("--pre", pre_, "Footage kept before an alert or POS transaction, at most 5m (initially 5s)")
         .Option("--post", post_, "Footage kept after it (initially 10s)")
@@ -51,7 +47,7 @@ std::string HoursOf(const store::RecordingPlan& plan) {
 }
 
 Json::Value PlanData(const store::RecordingPlan& plan) {
-    return Object("mode", NameOf(kModes, static_cast<int>(plan.mode)), "segment", plan.segment_s, "pre", plan.pre_s,
+    return Object("mode", NameOf(store::RecordModeNames(), plan.mode), "segment", plan.segment_s, "pre", plan.pre_s,
                   "post", plan.post_s, "mount_id", plan.mount_id, "profile", plan.profile, "hours", HoursOf(plan));
 }
 

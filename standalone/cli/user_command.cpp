@@ -13,6 +13,7 @@
 #include "standalone/store/cameras.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/users.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
@@ -23,11 +24,6 @@ using store::DeniableItem;
 using store::Privilege;
 using store::User;
 using store::Users;
-
-const Names<Privilege> kPrivileges = {
-    {"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}};
-const Names<CameraAccess> kAccess = {
-    {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
 
 struct ItemKind {
     DeniableItem kind;
@@ -51,7 +47,7 @@ struct Request {
 };
 
 std::string PrivilegeName(const Json::Value& privilege) {
-    return NameOf(kPrivileges, privilege.asInt());
+    return NameOf(store::PrivilegeNames(), static_cast<Privilege>(privilege.asInt()));
 }
 
 User RequireUser(Users& users, const std::string& name) {
@@ -76,7 +72,7 @@ void Append(std::string& text, const std::string& name, const Json::Value& ids) 
 // "audio 2; live 1 2"
 std::string DeniedAccessText(const Json::Value& denied) {
     std::string text;
-    for (const auto& [name, kind] : kAccess) {
+    for (const auto& [name, kind] : store::CameraAccessNames()) {
         Append(text, name, denied[name]);
     }
     return text;
@@ -125,7 +121,7 @@ void List(const Console& console) {
     for (const User& user : users.List()) {
         Json::Value& entry = data.append(ToData(user));
         store::Denials denials = users.FindDenials(user.id);
-        for (const auto& [name, kind] : kAccess) {
+        for (const auto& [name, kind] : store::CameraAccessNames()) {
             entry["denied"][name] = Ids(users.DeniedCameras(user.id, kind));
             entry["denied_groups"][name] = Ids(denials.groups[kind]);
         }
@@ -244,7 +240,7 @@ void AddUser(CLI::App& program, const Console& console) {
         return group.Add(verb, description, run).Option("name", request.name, "The account's name", Required);
     };
     add_command("add", "Adds an account; prompts for its password", Add)
-        .Option("--privilege", request.privilege, "Its privilege (default: viewer)", OneOf(kPrivileges));
+        .Option("--privilege", request.privilege, "Its privilege (default: viewer)", OneOf(store::PrivilegeNames()));
     group.Add("list", "Lists the accounts", List);
     add_command("passwd", "Changes a password and ends the account's sessions", SetPassword);
     add_command("remove", "Removes an account and ends its sessions", Remove);
@@ -257,8 +253,8 @@ void AddUser(CLI::App& program, const Console& console) {
                            std::string("Instead of a camera, this ") + item.name);
         }
         command.Flag("--mark", request.marks, "Instead of a camera, reporting alerts and POS transactions");
-        command.Option("--kind", request.kinds, "The kind of access; may be repeated (default: all)", OneOf(kAccess),
-                       Repeatable);
+        command.Option("--kind", request.kinds, "The kind of access; may be repeated (default: all)",
+                       OneOf(store::CameraAccessNames()), Repeatable);
     }
 }
 

@@ -1,0 +1,29 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/store/value_names.h"
+
+namespace lookhaven::store {
+
+const base::Names<RecordMode>& RecordModeNames() {
+    static const base::Names<RecordMode> names = {
+        {"always", RecordMode::kAlways}, {"never", RecordMode::kNever}, {"schedule", RecordMode::kSchedule}};
+    return names;
+}
+
+const base::Names<Privilege>& PrivilegeNames() {
+    static const base::Names<Privilege> names = {
+        {"owner", Privilege::kOwner}, {"manager", Privilege::kManager}, {"viewer", Privilege::kViewer}};
+    return names;
+}
+
+const base::Names<CameraAccess>& CameraAccessNames() {
+    static const base::Names<CameraAccess> names = {
+        {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
+    return names;
+}
+
+const base::Names<MarkKind>& MarkKindNames() {
+    static const base::Names<MarkKind> names = {{"alert", MarkKind::kAlert}, {"pos", MarkKind::kPos}};
+    return names;
+}
+
+}  // namespace lookhaven::store
