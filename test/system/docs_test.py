@@ -7,7 +7,8 @@ import re
 import time
 import unittest
 
-from installation import PASSWORDS, ROOT, Installation, Parts, call, recorded_events
+from installation import PASSWORDS, ROOT, Installation, call, recorded_events
+from parts import Parts
 
 EXAMPLE = re.compile(
     r"(?:```player\n([^`]*)```\s*)?```request(?: as (\w+))?\n([^`]*)```\s*```answer (\d+)(?: (\S+))?\n([^`]*)```"

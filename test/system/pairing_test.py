@@ -13,7 +13,8 @@ import time
 import unittest
 
 from api_test import call, play
-from installation import Installation, Parts, make_certificate, pairing_secret, pairing_token, wait_until
+from installation import Installation, make_certificate, pairing_secret, pairing_token, wait_until
+from parts import Parts
 
 
 class HostileHost(http.server.BaseHTTPRequestHandler):

@@ -1,7 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
-# through the web server, also while it is still being recorded; and a session's players give way to each other.
+# through the web server; and a session's players give way to each other. growing_test.py has what is still being recorded.
 import base64
 import contextlib
 import http.client
@@ -13,40 +13,10 @@ import subprocess
 import time
 import unittest
 
-from installation import PLAYER, Installation, Parts, call, recorded_events, wait_until
+from installation import Installation, call, recorded_events, wait_until
 from painted import NumberReader
+from players import BY_TIME, FAR, numbered, pictures, playing, steer
 from visit import Visit
-
-BY_TIME = "PlayMjpegEventNoFrameId"
-FAR = 10**6
-
-
-def playing(server, event, account="admin", timestamp=1, method="PlayMjpegEvent", cookie=None, **parameters):
-    """The player's stream as a Parts; the caller closes it."""
-    headers = {"Cookie": f"id={cookie or server.session(account)}"}
-    return Parts(*server.open(call(PLAYER, method, eventid=event, timestamp=timestamp, **parameters), headers=headers))
-
-
-def steer(server, method, **form):
-    return server.request(call("VEXO.Playback", method), "admin", form={"timestamp": 1, **form})
-
-
-def numbered(parts, count, times=None):
-    """Pairs of a number part and the picture after it; the capture times are added to the list."""
-    pairs = []
-    while len(pairs) < count:
-        head, body = parts.next()
-        assert head["content-type"] == "text/plain", head
-        picture_head, picture = parts.next()
-        assert picture_head["content-type"] == "image/jpeg", picture_head
-        if times is not None:
-            times.append(picture_head["x-capture-time"])
-        pairs.append((int(body), picture))
-    return pairs
-
-
-def pictures(parts, count):
-    return [parts.next()[1] for _ in range(count)]
 
 
 class PlaybackTest(unittest.TestCase):
@@ -305,52 +275,6 @@ class PlaybackTest(unittest.TestCase):
                     self.assertEqual(gone.response.status, 302)
             finally:
                 file.write_bytes(copy)
-
-
-class GrowingTest(unittest.TestCase):
-    """What the recorder is writing at the moment."""
-
-    @classmethod
-    def setUpClass(cls):
-        cls.server = cls.enterClassContext(Installation())
-
-    def growing(self):
-        def found():
-            return next((event for event in recorded_events(self.server, 1) if event["is_recording"]), None)
-        return wait_until(lambda: (found() or {"frame_count": 0})["frame_count"] >= 25 and found(), 30, "an event grows")
-
-    def check(self, shown):
-        painted = NumberReader(shown, 1280, 720).read(shown)
-        self.assertEqual(painted, [*range(painted[0], painted[0] + len(shown))])
-
-    def test_is_followed_from_any_frame_to_its_end_and_beyond(self):
-        event = self.growing()
-        rows = [(0, event["frame_count"] + 75, {"interval": 0}), (0, 25, {}), (20, 25, {}), (7, 25, {})]
-        for start, count, parameters in rows:
-            with playing(self.server, event["id"], framestart=start, framestop=FAR, **parameters) as parts:
-                pairs = numbered(parts, count)
-            self.assertEqual([number for number, _ in pairs], [*range(start, start + count)])
-            self.check([picture for _, picture in pairs])
-
-    def test_is_playable_up_to_this_moment(self):
-        event = self.growing()
-        wait_until(lambda: time.time() - event["start"] > 4, 10, "some footage")
-        start_ms = int((time.time() - event["start"]) * 1000) - 2500
-        with playing(self.server, event["id"], method=BY_TIME, flushHeader=1, startTimeMS=start_ms) as parts:
-            shown = [picture for _, picture in parts.rest()]
-        self.check(shown[1:])
-        # The event began up to a second after the whole second that the list tells.
-        self.assertGreaterEqual(len(shown), 25 * 1.5 - 8)
-        self.assertLess(len(shown), 25 * 2.5 + 25, "it ends where the recording was when it was asked for")
-
-    def test_pause_at_the_end_does_not_end_it(self):
-        event = self.growing()
-        with playing(self.server, event["id"], method=BY_TIME, flushHeader=1, stopTimeMS=FAR,
-                     startTimeMS=int((time.time() - event["start"]) * 1000) - 500) as parts:
-            pictures(parts, 20)
-            for on in ("true", "false", "true", "false"):
-                self.assertEqual(steer(self.server, "Pause", on=on).status, 200)
-                pictures(parts, 5)
 
 
 if __name__ == "__main__":

@@ -7,7 +7,8 @@ import re
 import time
 import unittest
 
-from installation import PASSWORDS, ROOT, Installation, Parts, call, pairing_secret, pairing_token, recorded_events
+from installation import PASSWORDS, ROOT, Installation, call, pairing_secret, pairing_token, recorded_events
+from parts import Parts
 
 # Columns are callers: nobody, one whose session has ended, a viewer; viewers who are denied cameras 1 and 2 (but may mark),
 # the sound of all, e-map 1, door 2; a viewer who may mark, a manager, a paired host.

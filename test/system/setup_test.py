@@ -7,7 +7,8 @@ import re
 import subprocess
 import unittest
 
-from installation import BUILD, LIVE, PASSWORDS, PLAYER, Installation, Parts, call
+from installation import BUILD, LIVE, PASSWORDS, PLAYER, Installation, call
+from parts import Parts
 from visit import Visit
 
 CAMERA = BUILD / "bin/rtsp-camera"

@@ -1,45 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Event and VEXO.Catalog: what can be marked, listed and found, by whom, and what bad input gets.
-#include <cmath>
+// VEXO.Event: what can be marked, listed, kept and found, by whom, and what bad input gets.
 #include <fstream>
 #include <set>
 
-#include <gtest/gtest.h>
-
 #include "standalone/base/clock.h"
-#include "standalone/control/common_config.h"
-#include "standalone/maintenance/recording_status.h"
-#include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/settings.h"
-#include "standalone/store/users.h"
-#include "test/support/footage/footage.h"
-#include "test/support/host/host_under_test.h"
+#include "test/component/api/event_fixture.h"
 
 namespace lookhaven::api {
 
-using host::Answer;
-using host::HostUnderTest;
-
 namespace {
-
-class EventApi : public testing::Test {
-  protected:
-    Answer Ask(const std::string& query, const std::string& form = "", bool as_viewer = false) const {
-        return host_.Ask("api=VEXO." + query, as_viewer ? viewer_ : admin_, {}, form);
-    }
-
-    HostUnderTest host_;
-    std::filesystem::path folder_ = host_.Home().Home();
-    test::Footage footage_{host_.Home().StoreUrl(), folder_};
-    std::string admin_ = host_.LogIn().secret;
-    // May play back camera 1 alone. Taking a right away ends the sessions that were there, so logs in afterwards.
-    std::string viewer_ =
-        (store::Users(footage_.Records()).Deny(2, 2),
-         store::Users(footage_.Records()).Deny(2, 3, {store::CameraAccess::kPlayback}), host_.LogIn("guest").secret);
-};
 
 TEST_F(EventApi, MarksAndListsWhatHappened) {
     const std::string mark = "Event&version=1&method=Mark";
@@ -267,101 +240,6 @@ TEST_F(EventApi, WalksThroughWhatCanBePlayed) {
                 << row.query;
         }
     }
-}
-
-TEST_F(EventApi, FindsAFrameByItsTimeAndGivesItsPicture) {
-    const std::int64_t noon = 1'772'366'400;
-    const std::string event = "event=" + std::to_string(footage_.Record(1, noon, 30));
-    const std::string alert =
-        "kind=alert&event=" + std::to_string(footage_.Mark(1, 1, noon + 20, 5, "door", std::stoi(event.substr(6))));
-    store::Event open = store::Events(footage_.Records()).Find(std::stoi(event.substr(6))).value();
-    open.id = store::Events(footage_.Records()).NextId();
-    open.recording = true;
-    open.start_s += 1000;
-    open.end_s += 1000;
-    store::Events(footage_.Records()).Begin(open);
-    const std::string growing = "event=" + std::to_string(open.id);
-    const struct {
-        std::string query;
-        std::int64_t time_ms;  // since noon
-        int frame;             // of the footage
-        int picture;           // of the recording
-        bool is_kept;
-    } rows[] = {
-        {event, 1234, 12, 12, true},      {event, -5, 0, 0, true},
-        {event, 99'000, 299, 299, true},  {alert, 20'550, 5, 205, true},
-        {alert, 0, 0, 200, true},         {growing, 1100, 11, 11, false},
-        {"camera=1", 1299, 12, 12, true}, {"camera=1", 40'000, 299, 299, false},
-    };
-    for (const auto& row : rows) {
-        const std::string asked = row.query + "&time_ms=" + std::to_string(noon * 1000 + row.time_ms);
-        SCOPED_TRACE(asked);
-        if (row.query != "camera=1") {
-            const Json::Value told = Ask("Event&version=1&method=Frame&" + asked).Json()["data"];
-            EXPECT_EQ(told["frame"], row.frame);
-            EXPECT_EQ(told["captured_ms"].asInt64(), noon * 1000 + row.picture * 100);
-            EXPECT_EQ(told["frame_count"], row.query == alert ? 50 : 300);
-        }
-        const Answer still = Ask("Picture&version=1&method=At&width=640&" + asked);
-        EXPECT_EQ(still.body, "picture " + std::to_string(row.picture));
-        EXPECT_EQ(std::llround(std::stod(still.headers.at("X-Capture-Time")) * 1000), noon * 1000 + row.picture * 100);
-        EXPECT_EQ(still.headers.at("Cache-Control") == "no-store", !row.is_kept);
-        if (row.is_kept) {
-            EXPECT_EQ(still.headers.at("Vary"), "Cookie");
-            const HostUnderTest::Headers known{{"HTTP_IF_NONE_MATCH", still.headers.at("ETag")}};
-            const Answer again = host_.Ask("api=VEXO.Picture&version=1&method=At&width=640&" + asked, admin_, known);
-            EXPECT_EQ(again.status, 304);
-            EXPECT_EQ(again.body, "");
-        }
-    }
-    EXPECT_EQ(Ask("Picture&version=1&method=At&width=640&frame=7&" + alert).body, "picture 207");
-}
-
-TEST_F(EventApi, TellsWhichCamerasAreDownToThoseWhoMayWatchThem) {
-    const std::string ask = "Catalog&version=1&method=CameraStates";
-    maintenance::RecordingStatus down{.camera = 1, .state = maintenance::RecordingState::kNoSignal};
-    down.lost_since_s = 1'772'352'930;
-    down.loss = base::SignalLoss::kRefused;
-    down.loss_reason = "cannot open rtsp://192.0.2.1/";
-    maintenance::RecordingStatus denied = down;
-    denied.camera = 2;
-    maintenance::WriteRecordingStatus(host_.Home(), {down, denied, {.camera = 3}});
-    EXPECT_EQ(Ask(ask).Json()["data"]["recorder"], false) << "stale";
-    EXPECT_TRUE(Ask(ask).Json()["data"]["camera"].empty());
-    control::CommonConfigKeeper(host_.Home()).Refresh(false);
-    const Json::Value all = Ask(ask).Json()["data"]["camera"];
-    ASSERT_EQ(all.size(), 3U);
-    EXPECT_EQ(all[0]["state"], "no-signal");
-    EXPECT_EQ(all[1]["no_signal"]["reason"], "cannot open rtsp://192.0.2.1/");
-    EXPECT_FALSE(all[2].isMember("no_signal"));
-    const Json::Value seen = Ask(ask, "", true).Json()["data"]["camera"];
-    ASSERT_EQ(seen.size(), 2U);
-    EXPECT_EQ(seen[0]["no_signal"]["cause"], "refused");
-    EXPECT_FALSE(seen[0]["no_signal"].isMember("reason")) << "an address of the cameras' network";
-}
-
-TEST_F(EventApi, ListsGroupsAndMountsThatTheCallerMaySee) {
-    store::Groups groups(footage_.Records());
-    groups.Add({0, "Front", {1, 2}});
-    const int yard = groups.Add({0, "Yard", {3}});
-    store::Users(footage_.Records()).DenyGroup(2, yard);
-    viewer_ = host_.LogIn("guest").secret;
-    store::Mounts(footage_.Records()).Add({.name = "Empty", .path = "/nowhere"});
-    const auto listed = [&](const char* method, const char* key, bool as_viewer) {
-        std::string text;
-        const Json::Value answer = Ask(std::string("Catalog&version=1&method=") + method, "", as_viewer).Json();
-        for (const Json::Value& each : answer["data"][key]) {
-            text += each["name"].asString() + ':';
-            for (const Json::Value& camera : each["camera"]) {
-                text += camera.asString() + ' ';
-            }
-        }
-        return text;
-    };
-    EXPECT_EQ(listed("Groups", "group", false), "Front:1 2 Yard:3 ");
-    EXPECT_EQ(listed("Groups", "group", true), "Front:1 ");
-    EXPECT_EQ(listed("Mounts", "mount", false), "Disk:1 2 3 Empty:");
-    EXPECT_EQ(listed("Mounts", "mount", true), "Disk:1 ");
 }
 
 }  // namespace

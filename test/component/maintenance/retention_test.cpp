@@ -1,48 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Old recordings make room: what goes, and all that must not go with it.
-#include "standalone/maintenance/retention.h"
-
 #include <algorithm>
 #include <array>
 #include <fstream>
-#include <functional>
-#include <limits>
 
-#include <dlfcn.h>
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <sched.h>
-#include <sys/mount.h>
-#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
-#include "standalone/base/installation.h"
-#include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
-#include "test/support/folder.h"
-#include "test/support/footage/footage.h"
-
-namespace {
-
-std::function<void(struct statvfs&)> g_lie;
-
-}  // namespace
-
-// In the place of the C library's: a file system that does not know what it holds.
-extern "C" int fstatvfs(int file, struct statvfs* report) {
-    // By the name that it has where files have sizes of 64 bits, which is an alias on machines of 64.
-    static const auto real = reinterpret_cast<int (*)(int, struct statvfs*)>(::dlsym(RTLD_NEXT, "fstatvfs64"));
-    const int result = real(file, report);
-    if (g_lie) {
-        g_lie(*report);
-    }
-    return result;
-}
+#include "test/component/maintenance/retention_fixture.h"
 
 namespace lookhaven::maintenance {
 namespace {
@@ -50,42 +21,6 @@ namespace {
 namespace fs = std::filesystem;
 using testing::ElementsAre;
 using testing::IsEmpty;
-
-constexpr std::int64_t kNoon = 1772366400;
-constexpr std::int64_t kEventBytes = 1'572'864;
-constexpr std::int64_t kNow = kNoon + 86400;
-
-class RetentionTest : public testing::Test {
-  protected:
-    RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId())); }
-
-    DeletionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
-        store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
-        mount.max_bytes = max_bytes;
-        mount.max_age_s = max_age_s;
-        return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_);
-    }
-
-    std::vector<int> Left() {
-        std::vector<int> ids;
-        store::Events(footage_.Records())
-            .Visit({.camera_ids = {1, 2, 3}, .end_s = kNow},
-                   [&](const store::Event& event) { ids.push_back(event.id); });
-        std::sort(ids.begin(), ids.end());
-        return ids;
-    }
-
-    static std::string MakeStore(const fs::path& folder) {
-        base::Installation::CreateFolders(folder);
-        store::Store::Migrate(base::Installation(folder).StoreUrl());
-        return base::Installation(folder).StoreUrl();
-    }
-
-    const test::TemporaryFolder folder_;
-    test::Footage footage_{MakeStore(folder_), folder_};
-    std::int64_t now_us_ = 0;
-    DiskWatch watch_;
-};
 
 TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     const int first = footage_.Record(2, kNoon, 60);
@@ -106,97 +41,6 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     ASSERT_TRUE(archive::ReadRecordingLog(footage_.Mount() / "1", kNoon + 100, log));
     EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "what is gone is not said to be there";
     EXPECT_EQ(std::count(log.begin() + 60, log.end(), 0), 0);
-}
-
-TEST_F(RetentionTest, TheOldestGoWhereNoFileCouldBeMade) {
-    const char* const mount = footage_.Mount().c_str();
-    if (::unshare(CLONE_NEWNS) != 0 || ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
-        ::mount("tmpfs", mount, "tmpfs", 0, "size=1g,nr_inodes=500") != 0) {
-        GTEST_SKIP() << "only root can make a file system of few files";
-    }
-    const MountMarker mark = MarkerFor(footage_.Records(), footage_.MountId());
-    MountFolder::WriteMarker(footage_.Mount(), mark);
-    footage_.Record(1, kNoon, 60);
-    const int second = footage_.Record(1, kNoon + 60, 60);
-    const auto space = [&] { return MountFolder::Open(footage_.Mount(), mark)->Space(); };
-    EXPECT_EQ(Run(0).events, 0);
-    while (space().free_files > 3 * space().ReserveFiles() - 2) {
-        std::ofstream(footage_.Mount() / ("x" + std::to_string(space().free_files)));
-    }
-    EXPECT_EQ(Run(0).events, 0) << "between the limits";
-    while (space().free_files > 0) {
-        std::ofstream(footage_.Mount() / ("x" + std::to_string(space().free_files)));
-    }
-    EXPECT_EQ(Run(0).events, 2) << "as many as there are";
-    EXPECT_THAT(Left(), IsEmpty()) << second;
-    ::umount2(mount, MNT_DETACH);
-}
-
-TEST_F(RetentionTest, NothingGoesForAFileSystemThatReportsNonsense) {
-    footage_.Record(1, kNoon, 60);
-    constexpr auto kUnknown = std::numeric_limits<fsfilcnt_t>::max();
-    const std::function<void(struct statvfs&)> lies[] = {
-        [](auto& report) { report.f_files = 1000, report.f_favail = 0; },
-        [](auto& report) { report.f_files = report.f_favail = 0; },
-        [](auto& report) { report.f_files = report.f_favail = kUnknown; },
-        [](auto& report) { report.f_blocks = report.f_bavail = 0; },
-        [](auto& report) { report.f_blocks = report.f_bavail = kUnknown; },
-    };
-    for (const auto& lie : lies) {
-        g_lie = lie;
-        EXPECT_EQ(Run(0).events, 0) << &lie - lies;
-    }
-    g_lie = [](auto& report) { report.f_bavail = 0; };
-    EXPECT_EQ(Run(0).events, 1) << "full";
-    g_lie = {};
-}
-
-TEST_F(RetentionTest, ADiskThatGetsNoSpaceBackLosesNoMoreThanWasNeeded) {
-    int recorded = 0;
-    const auto record = [&](int count) {
-        for (; count > 0; --count) {
-            footage_.Record(1, kNoon + 60 * recorded++, 60);
-        }
-    };
-    // 100 MiB; twice the reserve is 4 MiB, and 6 MiB are to be free.
-    std::int64_t free_bytes = 3 << 20;
-    g_lie = [&](auto& report) {
-        report.f_blocks = (100 << 20) / report.f_frsize;
-        report.f_bavail = static_cast<fsblkcnt_t>(free_bytes) / report.f_frsize;
-    };
-    const struct {
-        int at_s, freed, recorded, deleted;
-        bool is_held;
-        const char* what;
-    } rows[] = {
-        {0, 0, 20, 2, false, "what is needed"},
-        {50, 0, 0, 0, false, "it may yet come"},
-        {55, 0, 2, 2, false, "it came, and was recorded to"},
-        {100, 2, 0, 0, false, "it comes late"},
-        {110, -2, 0, 2, false, "in vain"},
-        {171, 0, 0, 1, true, "one, to see"},
-        {290, 0, 0, 0, true, "not every minute"},
-        {292, 0, 0, 1, true, "another"},
-        {10'000, 0, 0, 1, true, ""},
-        {20'000, 0, 0, 1, true, ""},
-        {30'000, 0, 0, 1, true, ""},
-        {40'000, 0, 0, 1, true, ""},
-        {43'599, 0, 0, 0, true, "every hour"},
-        {43'601, 0, 0, 1, true, ""},
-        {43'611, 8, 0, 0, false, "the snapshot is removed"},
-        {43'621, -8, 0, 2, false, "full again"},
-    };
-    for (const auto& row : rows) {
-        now_us_ = std::int64_t{1'000'000} * row.at_s;
-        free_bytes += row.freed * kEventBytes;
-        record(row.recorded);
-        EXPECT_EQ(Run(0).events, row.deleted) << row.at_s << " s: " << row.what;
-        EXPECT_EQ(watch_.IsHeld(), row.is_held) << row.at_s << " s: " << row.what;
-    }
-    watch_ = {SpaceWatch(true), SpaceWatch(true)};
-    EXPECT_EQ(Run(0).events, 1) << "after a restart";
-    EXPECT_EQ(Run(static_cast<int>(Left().size() - 1) * kEventBytes).events, 1) << "for the mount's own limit";
-    g_lie = {};
 }
 
 TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {

@@ -1,16 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Events and marks: what is asked of the store is what a look at every single one would give.
+// Events: what is asked of the store is what a look at every single one would give.
 #include <algorithm>
 #include <array>
-#include <atomic>
-#include <random>
 
 #include "standalone/store/events.h"
 #include "standalone/store/kept_events.h"
-#include "standalone/store/marks.h"
-#include "standalone/store/recording_plans.h"
-#include "test/component/store/store_fixture.h"
+#include "test/component/store/random_records.h"
 
 namespace lookhaven::store {
 namespace {
@@ -18,38 +14,8 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-constexpr std::int64_t kDay = 4'000'000'000;  // beyond 31 bits
-constexpr std::int64_t kNever = std::numeric_limits<std::int64_t>::max();
-
-template <typename Record>
-std::vector<int> Ids(const std::vector<Record>& records) {
-    std::vector<int> ids;
-    std::ranges::transform(records, std::back_inserter(ids), &Record::id);
-    return ids;
-}
-
-// What a look at every record gives: those that pass, by start and id, then the slice.
-template <typename Record, typename Filter, typename Passes>
-std::vector<Record> Naive(std::vector<Record> records, const Filter& filter, Passes passes) {
-    std::erase_if(records, [&](const Record& record) {
-        return !filter.camera_ids.contains(record.camera_id) || record.start_s >= filter.end_s ||
-               record.end_s <= filter.begin_s || !passes(record);
-    });
-    const auto key = [](const Record& record) { return std::pair(record.start_s, record.id); };
-    std::ranges::sort(records, {}, key);
-    if (filter.newest_first) {
-        std::ranges::reverse(records);
-    }
-    const auto first = std::min(records.size(), static_cast<std::size_t>(filter.offset));
-    const auto count = std::min(records.size() - first, static_cast<std::size_t>(filter.limit));
-    return {records.begin() + static_cast<std::ptrdiff_t>(first),
-            records.begin() + static_cast<std::ptrdiff_t>(first + count)};
-}
-
-class EventTest : public StoreTest {
+class EventTest : public RandomRecords {
   protected:
-    int Draw(int first, int last) { return std::uniform_int_distribution(first, last)(random_); }
-
     Event RandomEvent() {
         Event event;
         event.camera_id = Draw(1, 5);
@@ -70,46 +36,7 @@ class EventTest : public StoreTest {
         return event;
     }
 
-    template <typename Filter>
-    Filter RandomSpan(std::int64_t first_s) {
-        Filter filter;
-        for (int cameras = Draw(0, 4); cameras > 0; --cameras) {
-            filter.camera_ids.insert(Draw(0, 6));
-        }
-        if (Draw(0, 4) != 0) {
-            const std::int64_t begin_s = first_s + Draw(-10, 400) * 60;
-            filter.begin_s = Draw(0, 9) == 0 ? -kNever - 1 : begin_s;
-            filter.end_s = Draw(0, 9) == 0 ? kNever : begin_s + Draw(-5, 100) * 60;
-        }
-        filter.newest_first = Draw(0, 2) == 0;
-        filter.offset = Draw(0, 2) == 0 ? Draw(0, 20) : 0;
-        filter.limit = Draw(0, 1) == 0 ? Draw(0, 20) : filter.limit;
-        return filter;
-    }
-
-    Step RandomStep(std::int64_t first_s) {
-        Step step{RandomSpan<EventFilter>(first_s).camera_ids};
-        step.start_s = first_s + Draw(-1, 41) * 600;
-        step.id = Draw(0, 400);
-        step.backwards = Draw(0, 1) == 0;
-        return step;
-    }
-    // What a look at every record gives.
-    template <typename Record, typename Passes>
-    static std::optional<Record> NaiveNext(const std::vector<Record>& records, const Step& step, Passes passes) {
-        std::optional<Record> next;
-        for (const Record& record : records) {
-            if (step.camera_ids.contains(record.camera_id) && !record.demo && passes(record) &&
-                step.IsNearer(step, record) && (!next || step.IsNearer(record, *next))) {
-                next = record;
-            }
-        }
-        return next;
-    }
-
-    std::mt19937 random_{19528};
     Events events_{store_};
-    Marks marks_{store_};
 };
 
 TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
@@ -241,106 +168,6 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
         spoil(broken);
         EXPECT_THROW(events_.Begin(broken), InvalidRecord) << broken.start_s << broken.path;
     }
-}
-
-TEST_P(EventTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
-    const int camera = AddCamera();
-    const Mark alert = marks_.Add(MarkKind::kAlert, camera, kDay / 2, 0, "line one\nzwei");
-    EXPECT_EQ(alert.start_s, kDay / 2 - RecordingPlan().pre_s);
-    EXPECT_EQ(alert.end_s, kDay / 2 + RecordingPlan().post_s);
-    RecordingPlans(store_).Set(camera, {.pre_s = 300, .post_s = 0});
-    const Mark pos = marks_.Add(MarkKind::kPos, camera, 100, kMaxMarkSeconds, "");
-    EXPECT_EQ(pos.start_s, 0) << "not before 1970";
-    EXPECT_EQ(pos.end_s, 100 + kMaxMarkSeconds);
-
-    EXPECT_THAT(Ids(marks_.Pending()), ElementsAre(pos.id, alert.id));
-    EXPECT_EQ(marks_.Find(MarkKind::kAlert, alert.id).value(), alert);
-    EXPECT_FALSE(marks_.Find(MarkKind::kPos, alert.id)) << "an alert is no POS transaction";
-    EXPECT_FALSE(events_.Find(alert.id));
-    EXPECT_GT(events_.NextId(), pos.id) << "one counter for both";
-    EXPECT_THAT(marks_.EndedBy(camera, kDay, {}, 9), IsEmpty()) << "pending";
-    EXPECT_TRUE(marks_.Save(pos.id, 7, "1/a.span"));
-    EXPECT_TRUE(marks_.Miss(alert.id));
-    EXPECT_THAT(marks_.Pending(), IsEmpty());
-    EXPECT_THAT(Ids(marks_.OnMount(7)), ElementsAre(pos.id));
-    EXPECT_EQ(marks_.OnMount(7)[0].path, "1/a.span");
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s - 1, {}, 9)), ElementsAre(pos.id));
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, {}, 9)), ElementsAre(pos.id, alert.id));
-    EXPECT_THAT(Ids(marks_.EndedBy(camera, alert.end_s, pos, 9)), ElementsAre(alert.id));
-    EXPECT_TRUE(marks_.Remove(pos.id));
-    EXPECT_FALSE(marks_.Remove(pos.id) || marks_.Save(pos.id, 7, "x") || marks_.Miss(pos.id));
-
-    EXPECT_THROW(marks_.Add(MarkKind::kAlert, 99, 100, 0, ""), NotFound);
-    const Mark told = marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, kDay);
-    EXPECT_EQ(marks_.Find(MarkKind::kAlert, told.id)->reporter, (Reporter{7, "till"}));
-    for (int of = 0; of < 2; ++of) {
-        EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {}, kDay, 1)) << "nobody's";
-    }
-    EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1), TooManyMarks) << "waits";
-    EXPECT_TRUE(marks_.Miss(told.id));
-    EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1)) << "a day later";
-    std::atomic<int> added = 0;
-    InParallel(6, [&](Store& store) {
-        try {
-            Marks(store).Add(MarkKind::kAlert, camera, 100, 0, "", {8, "till"}, kDay, 2);
-            ++added;
-        } catch (const TooManyMarks&) {
-        }
-    });
-    EXPECT_EQ(added, 2);
-    for (const auto& [moment, length] : {std::pair<std::int64_t, std::int64_t>{-1, 0},
-                                         {kNever, 0},
-                                         {1LL << 31, 0},
-                                         {100, -1},
-                                         {100, kMaxMarkSeconds + 1},
-                                         {100, kNever}}) {
-        EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, moment, length, ""), InvalidRecord) << moment << length;
-    }
-    for (const std::string& text : kHostileTexts) {
-        try {
-            const Mark kept = marks_.Add(MarkKind::kPos, camera, 100, 0, text);
-            EXPECT_EQ(marks_.Find(MarkKind::kPos, kept.id)->text, text);
-        } catch (const InvalidRecord&) {
-            EXPECT_TRUE(text.size() > kMaxMarkTextBytes ||
-                        std::ranges::any_of(text, [](char c) { return c != '\n' && (c < ' ' || c > '~'); }))
-                << text;
-        }
-    }
-}
-
-TEST_P(EventTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
-    std::vector<Mark> all(200);
-    std::ranges::generate(all, [this, id = 1]() mutable {
-        Mark mark;
-        mark.id = id++;
-        mark.kind = Draw(0, 1) == 0 ? MarkKind::kAlert : MarkKind::kPos;
-        mark.camera_id = Draw(1, 5);
-        mark.start_s = kDay / 2 + Draw(0, 40) * 600;
-        mark.moment_s = mark.start_s + 5;
-        mark.end_s = mark.start_s + (Draw(0, 5) == 0 ? 4200 : Draw(0, 600));
-        mark.text = "receipt " + std::to_string(mark.id);
-        mark.state = Draw(0, 3) == 0 ? MarkState::kMissed : MarkState::kSaved;
-        mark.mount_id = 1;
-        return mark;
-    });
-    marks_.AddAll(all);
-    int found = 0;
-    for (int i = 0; i < 100; ++i) {
-        auto filter = RandomSpan<MarkFilter>(kDay / 2);
-        filter.kind = Draw(0, 1) == 0 ? std::nullopt : std::optional(MarkKind::kPos);
-        const auto expected =
-            Naive(all, filter, [&](const Mark& mark) { return !filter.kind || mark.kind == *filter.kind; });
-        ASSERT_EQ(marks_.List(filter), expected) << i;
-        const Step step = RandomStep(kDay / 2);
-        ASSERT_EQ(marks_.Next(step, filter.kind), NaiveNext(all, step,
-                                                            [&](const Mark& mark) {
-                                                                return mark.state == MarkState::kSaved &&
-                                                                       (!filter.kind || mark.kind == *filter.kind);
-                                                            }))
-            << i;
-        found += static_cast<int>(expected.size());
-    }
-    EXPECT_GT(found, 200);
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(EventTest);

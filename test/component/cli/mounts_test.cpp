@@ -1,0 +1,106 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The command line's view of where and when cameras are recorded: mounts, plans and groups.
+#include <filesystem>
+#include <fstream>
+
+#include "standalone/base/file.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/recording_plans.h"
+#include "standalone/store/settings.h"
+#include "test/component/cli/recordings_fixture.h"
+
+namespace lookhaven::cli {
+namespace {
+
+using testing::ElementsAre;
+
+class MountsTest : public RecordingsTest {};
+
+TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
+    const std::string disk = (folder_ / "disk").string();
+    std::filesystem::create_directories(disk);
+    std::filesystem::create_symlink(disk, folder_ / "link");
+    const std::ofstream file(folder_ / "file");
+    Play({{"mount add " + (folder_ / "none").string(), 66, "no folder"},
+          {"mount add " + (folder_ / "file").string(), 66, "no folder"},
+          {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "Added mount disk with id"},
+          {"mount add " + (folder_ / "link").string() + " --name other", 65, "belongs to mount 2"},
+          {"mount add " + (folder_ / "link").string() + " --name other --take-over", 65, "inside each other"},
+          {"mount add " + disk + " --limit 5X", 64, "a size looks like"},
+          {"mount list", 0, "1.5 TiB  30d"},
+          {"mount set 9 --name x", 66, "no mount 9"},
+          {"mount remove 1", 65, "is the default"}});
+    store::Store store = Open();
+    store::Mounts mounts(store);
+    const int id = mounts.List().back().id;
+    const std::string number = std::to_string(id);
+    EXPECT_EQ(base::ReadFile(disk + "/.lookhaven-mount"),
+              "lookhaven mount " + number + " of " + store::Settings(store).Installation() + "\n");
+    std::filesystem::create_directories(folder_ / "foreign/41/2026-03-01");
+    std::ofstream(folder_ / "foreign/41/2026-03-01/081500-4711.mkv") << "x";
+    std::ofstream(folder_ / "foreign/.lookhaven-mount") << "lookhaven mount " + number + " of another\n";
+    const std::string foreign = (folder_ / "foreign").string();
+    Play({{"mount add " + foreign, 65, "another installation"},
+          {"mount set " + number + " --path " + foreign, 65, "--take-over"},
+          {"mount set " + number + " --path " + (home_ / "recordings").string(), 65, "belongs to mount 1"},
+          {"mount add " + foreign + " --take-over", 0, "Added mount foreign"}});
+    EXPECT_GT(store::Events(store).NextId(), 4711) << "footage there keeps its numbers";
+    Play({{"camera add --name New --source test:mjpeg --type mjpeg --json", 0, "\"id\" : 42"}});
+
+    Play({{"mount set " + number + " --default --limit 0 --name Disk --disable --json", 0, "\"max_bytes\" : 0"},
+          {"mount list", 0, "default disabled"},
+          {"camera set 1 --mount 1 --json", 0, "\"mount_id\" : 1"},
+          {"mount remove 1", 65, "cameras record"},
+          {"camera set 1 --mount 0", 0, "Changed"}});
+    Play({{"setting set mount-folders srv", 65, "begins with /"},
+          {"setting set mount-folders /srv:", 65, "begins with /"},
+          {"setting set mount-folders /srv:/mnt", 0, "/srv:/mnt"}});
+    store::Events events(store);
+    AddRow(events, 1, kStart, base::kReasonContinuous, false);
+    Play({{"mount set 1 --limit 500", 64, "a size looks like"},
+          {"mount set 1 --max-age 30", 64, "a duration looks like"},
+          {"mount set 1 --max-age 30d --name Old", 65, "deletes the 1 oldest recordings"},
+          {"mount list", 0, "none", "Old"},
+          {"mount set 1 --max-age 30d --yes", 0, "Changed"},
+          {"mount set 1 --max-age 31d", 0, "Changed"},
+          {"mount remove 1", 65, "--forget"},
+          {"mount remove 1 --forget", 0, "files stay"},
+          {"event list", 0, "no such event"}});
+    EXPECT_TRUE(std::filesystem::exists(home_ / "recordings"));
+}
+
+TEST_F(MountsTest, PlansAndGroupsAreChangedAndDenied) {
+    Play({{"camera set 3 --record always --segment 1m --pre 0 --post 5m --record-profile low", 0, "Changed"},
+          {"camera set 3 --name Hall", 0, "Changed"},
+          {"camera list --json", 0, "\"segment\" : 60"},
+          {"camera set 3 --segment 5s", 65, "10 to 3600"},
+          {"camera set 3 --segment 99999999999d", 64, "a duration looks like"},
+          {"camera set 3 --pre 99999999s", 65, "0 to 300"},
+          {"camera set 3 --mount 9", 66, "no mount 9"},
+          {"camera set 3 --record sometimes", 64, "--record"},
+          {"camera add --name New --source test:mjpeg --type mjpeg --record always --post 1m --json", 0,
+           "\"post\" : 60"},
+          {"group add Front --camera 3 --camera 4", 0, "id 2"},
+          {"group add Front", 65, "already"},
+          {"group add Back --camera 99", 66, "no camera 99"},
+          {"group set 2 --drop 3 --add 1", 0, "cameras 1 4"},
+          {"group set 9 --name x", 66, "no camera group 9"},
+          {"group list --json", 0, "\"Front\""},
+          {"user deny viewer --group 2 --kind playback --kind audio", 0, "group 2 is denied"},
+          {"user deny viewer --group 9", 66, "no camera group 9"},
+          {"user deny viewer", 64, "name one camera"},
+          {"user deny viewer 1 --group 2", 64, "name one camera"},
+          {"user list", 0, "playback 1 2 4  audio 2; playback 2"},
+          {"user allow viewer 1 --kind audio", 0, "belongs to a group that is denied"},
+          {"user allow viewer --group 2", 0, "allowed"},
+          {"user list", 0, "playback 2", "playback 1"},
+          {"group remove 2", 0, "cameras are kept"},
+          {"group remove 2", 66, "no camera group 2"}});
+    store::Store store = Open();
+    const store::RecordingPlan plan = store::RecordingPlans(store).Find(3);
+    EXPECT_THAT(std::vector({plan.segment_s, plan.pre_s, plan.post_s, plan.profile}), ElementsAre(60, 0, 300, 1));
+}
+
+}  // namespace
+}  // namespace lookhaven::cli
