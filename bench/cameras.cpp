@@ -10,11 +10,8 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdint>
-#include <fstream>
 #include <iostream>
-#include <iterator>
 #include <list>
-#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -26,12 +23,14 @@
 #include <sys/prctl.h>
 #include <sys/socket.h>
 
+#include "bench/footage.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/file_descriptor.h"
 
 namespace {
 
+using bench::Footage;
 using lookhaven::base::FileDescriptor;
 using lookhaven::base::MonotonicMicros;
 
@@ -41,57 +40,6 @@ constexpr std::uint32_t kAudioTicks = 1024;  // of 48 kHz an AAC frame
 constexpr std::size_t kPayloadBytes = 1400;
 constexpr std::int64_t kSpreadMicros = 7'300;  // shares no factor with a frame's time
 constexpr std::size_t kMaxUnsentBytes = 4 << 20;
-
-struct Footage {
-    std::vector<std::vector<std::string>> video;  // NAL units of each frame
-    std::vector<std::string> audio;
-    std::string audio_config;  // hexadecimal
-    std::string jpeg;
-};
-
-std::string ReadFile(const char* path) {
-    std::ifstream file(path, std::ios::binary);
-    if (!file) {
-        throw std::runtime_error(std::string("cannot read ") + path);
-    }
-    return {std::istreambuf_iterator<char>(file), {}};
-}
-
-std::vector<std::vector<std::string>> SplitAnnexB(const std::string& bytes) {
-    using namespace std::string_literals;
-    constexpr int kDelimiter = 9;
-    const std::string start = "\0\0\1"s;
-    std::vector<std::vector<std::string>> frames;
-    for (std::size_t at = bytes.find(start); at != bytes.npos;) {
-        const std::size_t next = bytes.find(start, at + start.size());
-        std::string nal = bytes.substr(at + start.size(), next == bytes.npos ? next : next - at - start.size());
-        nal.erase(nal.find_last_not_of('\0') + 1);
-        if ((nal.at(0) & 0x1f) == kDelimiter) {
-            frames.emplace_back();
-        } else {
-            frames.at(frames.size() - 1).push_back(std::move(nal));
-        }
-        at = next;
-    }
-    return frames;
-}
-
-void SplitAdts(const std::string& bytes, Footage& footage) {
-    constexpr std::size_t kHeadBytes = 7;
-    const auto byte = [&bytes](std::size_t at) {
-        return static_cast<unsigned>(static_cast<unsigned char>(bytes.at(at)));
-    };
-    const unsigned config =
-        ((byte(2) >> 6) + 1) << 11 | (byte(2) >> 2 & 15) << 7 | ((byte(2) & 1) << 2 | byte(3) >> 6) << 3;
-    std::array<char, 8> digits{};
-    std::snprintf(digits.data(), digits.size(), "%04x", config);
-    footage.audio_config = digits.data();
-    for (std::size_t at = 0; at + kHeadBytes < bytes.size();) {
-        const std::size_t size = (byte(at + 3) & 3) << 11 | byte(at + 4) << 3 | byte(at + 5) >> 5;
-        footage.audio.push_back(bytes.substr(at + kHeadBytes, size - kHeadBytes));
-        at += size;
-    }
-}
 
 void AppendBig(std::string& to, std::uint32_t value, int bytes) {
     while (bytes-- > 0) {
@@ -321,11 +269,7 @@ int main(int count, char** arguments) try {
         return 64;
     }
     ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-    Footage footage;
-    footage.video = SplitAnnexB(ReadFile(arguments[1]));
-    SplitAdts(ReadFile(arguments[2]), footage);
-    footage.jpeg = ReadFile(arguments[3]);
-    Cameras cameras(std::move(footage));
+    Cameras cameras(bench::ReadFootage(arguments[1], arguments[2], arguments[3]));
     for (;;) {
         cameras.Step();
     }

@@ -46,7 +46,7 @@ def planted_rows(first_id):
         for half in range(2)
     ]
     return [
-        (first_id + number, camera, 1, start, start + min(length, 7200), 0, 1, 25 * length, 4_000_000, 5, "AAC", 1280,
+        (first_id + number, camera, 1, start, start + min(length, 7200), 0, 1, 25 * length, 4_000_000, 3, "AAC", 1280,
          720, f"{camera}/2020-01-01/000000-{first_id + number}.mkv", 0, 1)
         for number, (camera, start, length) in enumerate(spans)
     ]
