@@ -11,7 +11,7 @@
 
 namespace lookhaven::admin {
 
-// Of those of the recordings that exist; all of them or, where it throws, none. Each returns how many there were. An
+// Unknown ids are ignored. All or nothing: what throws has changed none. Each returns how many it changed. An
 // account becomes their keeper by its name, the command line without one. Throw what Apply throws; KeepEvents
 // store::InvalidRecord for what is no note.
 int KeepEvents(store::Store& store, const Actor& actor, const std::vector<int>& ids, const std::string& note);

@@ -10,7 +10,7 @@
 namespace lookhaven::cli {
 
 void AddInit(CLI::App& program, const Console& console);
-void AddSetup(CLI::App& program, const Console& console);
+void AddSetupAddress(CLI::App& program, const Console& console);
 void AddAudit(CLI::App& program, const Console& console);
 void AddCamera(CLI::App& program, const Console& console);
 void AddUser(CLI::App& program, const Console& console);

@@ -82,8 +82,8 @@ int Run(int argc, char** argv) {
                        "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
     for (const auto add :
-         {AddInit, AddSetup, AddAudit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddExport, AddEmap,
-          AddDevices, AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
+         {AddInit, AddSetupAddress, AddAudit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddExport,
+          AddEmap, AddDevices, AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);

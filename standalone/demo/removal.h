@@ -17,7 +17,7 @@ struct RemovalResult {
 };
 
 // Removes the demo's cameras, group, devices and e-maps as far as they are still what the demo made, the cameras'
-// recordings but archived ones, and all generated events. The account stays. While recordings grow, nothing is removed
+// recordings but kept ones, and all generated events. The account stays. While recordings grow, nothing is removed
 // but the cameras are disabled: call it again. Files are removed by the recorder's next pass over the mount.
 RemovalResult Remove(store::Store& store, const std::filesystem::path& home);
 

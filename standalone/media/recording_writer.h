@@ -65,8 +65,8 @@ class RecordingWriter {
 
     // Flushes, writes what makes the file seekable for other programs, and marks the index finished. Clusters that the
     // disk does not take, or did not take whole before, are cut off, with a warning in the log; a recording without a
-    // frame is removed. Throws WriteError when the file cannot even be finished so; call it again later then. Also allowed after
-    // it succeeded.
+    // frame is removed. Throws WriteError when the file cannot even be finished so; call it again later then. Also
+    // allowed after it succeeded.
     void Close();
 
     // Of what was flushed.

@@ -18,14 +18,15 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kTryAgainUs = 1'000'000;
-// Until the recorder knows of a mark, or has a number for the event: it asks the store once a second, which may be slow.
+// Until the recorder knows of a mark, or has a number for the event: it asks the store once a second, which may be
+// slow.
 constexpr int kMaxWaitSeconds = 2;
 // Events that begin for a camera's times alone: so many at once, and then one in each interval.
 constexpr std::int64_t kCutsAtOnce = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
-// Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk that
-// stays broken could not be unmounted; recovery finishes what is left.
+// Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk
+// that stays broken could not be unmounted; recovery finishes what is left.
 constexpr std::int64_t kFinishForUs = 60'000'000;
 constexpr std::size_t kMaxUnfinished = 4;
 // Split here even where no key frame comes or the next event has no number.

@@ -37,7 +37,7 @@ class KeptEvents {
 
     // Nothing for an event that is not kept.
     std::optional<Keeping> Find(int event_id);
-    // By their events, those of events that are kept from one id to the other.
+    // By event id, of the kept events with first <= id <= last.
     std::map<int, Keeping> FindBetween(int first_event_id, int last_event_id);
     // What kept events take of the mount.
     std::int64_t SizeBytes(int mount_id);

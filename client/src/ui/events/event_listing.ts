@@ -34,6 +34,6 @@ export function whyNoEvents(filter: EventFilter, hidden: number, calendar: Calen
   if (calendar.hasRecordings) return "No events in this time span. The calendar marks the days with recordings.";
   return (
     "Nothing was recorded of these cameras in the month of the calendar. Look at another month or other cameras; " +
-    "a manager starts recording with “lookhaven camera set 1 --record always”."
+    "a manager can switch recording on under Settings › Cameras."
   );
 }

@@ -40,9 +40,10 @@ std::vector<std::string> AddressesOf(const base::Installation& installation, con
 std::string TextOf(const std::vector<std::string>& addresses) {
     constexpr std::int64_t kMinutes = admin::kSetupTokenLifetimeS / 60;
     std::string text = addresses.front().front() == '#'
-                           ? Concat("There is no account yet. To make it, open Lookhaven's page in a browser within ",
+                           ? Concat("There is no account yet. To make the first one, open Lookhaven's page in a browser"
+                                    " within ",
                                     kMinutes, " minutes, with this at the end of its address:\n")
-                           : Concat("There is no account yet. To make it, open one of these in a browser within ",
+                           : Concat("There is no account yet. To make the first one, open this in a browser within ",
                                     kMinutes, " minutes (http:// on this machine only):\n");
     for (const std::string& address : addresses) {
         text += "\n    " + address;
@@ -72,7 +73,7 @@ void Print(const Console& console, const Request& request) {
 
 }  // namespace
 
-void AddSetup(CLI::App& program, const Console& console) {
+void AddSetupAddress(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console);
     group.Add("setup-address", "Prints the one-time address at which a browser makes the first account", Print)
         .Flag("--if-needed", group.request().if_needed, "Prints nothing when there is an account already");
