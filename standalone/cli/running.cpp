@@ -20,8 +20,9 @@ namespace lookhaven::cli {
 namespace {
 
 constexpr int kSocketTimeoutMs = 3000;
-// A recorder renews its lease every five seconds.
-constexpr std::chrono::seconds kLeaseWait{6};
+// A recorder renews its lease every five seconds, later where its store is slow.
+constexpr std::chrono::milliseconds kLeaseWait{12'000};
+constexpr std::chrono::milliseconds kLeaseLook{500};
 
 }  // namespace
 
@@ -64,9 +65,11 @@ void RequireNoOtherRecorder(const base::Installation& installation, store::Store
     if (before.holder.empty() || before.holder == store::RecorderName(installation)) {
         return;
     }
-    std::this_thread::sleep_for(kLeaseWait);
-    if (lease.Current().count != before.count) {
-        throw Failure(kUnavailable, "the recorder of ", before.holder, " records into this store: stop it first");
+    for (auto waited = kLeaseLook; waited <= kLeaseWait; waited += kLeaseLook) {
+        std::this_thread::sleep_for(kLeaseLook);
+        if (lease.Current().count != before.count) {
+            throw Failure(kUnavailable, "the recorder of ", before.holder, " records into this store: stop it first");
+        }
     }
 }
 

@@ -2,6 +2,7 @@
 #include "standalone/maintenance/deletion.h"
 
 #include <algorithm>
+#include <exception>
 #include <filesystem>
 #include <map>
 #include <optional>
@@ -39,20 +40,24 @@ void Deletion::Delete(std::span<const store::Event> events) {
 
 void Deletion::Finish() {
     const std::vector<store::Event> pending = events_.PendingDeletion(mount_.id);
-    for (std::span rest(pending); !rest.empty();) {
-        const std::span page = rest.first(std::min(rest.size(), kEventsAtOnce));
-        std::size_t removed = 0;
-        try {
-            for (; removed < page.size(); ++removed) {
-                RemoveFile(page[removed]);
-            }
-        } catch (const std::system_error&) {
-            events_.CancelDeletion(IdsOf(rest.subspan(removed)));
-            Forget(page.first(removed));
-            throw;
+    std::size_t removed = 0;
+    std::exception_ptr failure;
+    try {
+        for (; removed < pending.size(); ++removed) {
+            RemoveFile(pending[removed]);
         }
+    } catch (const std::system_error&) {
+        // Before any is forgotten: the seconds and marks that they share with others stay.
+        failure = std::current_exception();
+        events_.CancelDeletion(IdsOf(std::span(pending).subspan(removed)));
+    }
+    for (std::span rest = std::span(pending).first(removed); !rest.empty();) {
+        const std::span page = rest.first(std::min(rest.size(), kEventsAtOnce));
         Forget(page);
         rest = rest.subspan(page.size());
+    }
+    if (failure) {
+        std::rethrow_exception(failure);
     }
 }
 

@@ -38,6 +38,13 @@ archive::IndexHeader HeaderOf(const MediaFormat& format, std::int64_t start_wall
             reason};
 }
 
+// While the disk is away its paths lead elsewhere, where nothing of it is.
+bool IsGone(const std::filesystem::path& path, dev_t device) {
+    struct stat status {};
+    return ::stat(path.c_str(), &status) != 0 && errno == ENOENT && ::stat(path.parent_path().c_str(), &status) == 0 &&
+           status.st_dev == device;
+}
+
 // Runs a step of writing and turns what it throws into a WriteError.
 template <class Step>
 void OnDisk(Step step) {
@@ -135,7 +142,7 @@ void RecordingWriter::Close() {
     if (!has_failed_ && output_ != nullptr) {
         End();
     }
-    if (has_failed_) {
+    if (has_failed_ && !std::exchange(is_index_final_, true)) {
         IndexWhatIsWhole();
     }
     OnDisk([&] {
@@ -169,22 +176,26 @@ void RecordingWriter::End() {
     output_.reset();  // it cannot be ended twice
 }
 
-// Clusters may have come to the disk whole before it failed.
+// Clusters may have come to the disk whole before it was full.
 void RecordingWriter::IndexWhatIsWhole() {
     try {
+        Sync();
         AppendToIndex();
     } catch (const std::exception&) {
         return;  // they are cut off
     }
 }
 
-// The path leads elsewhere while the disk is away, so the file itself is asked whether it is gone.
 void RecordingWriter::Remove() const {
-    archive::RemoveFile(archive::IndexPathOf(path_));
-    archive::RemoveFile(path_);
-    struct stat status {};
-    if (::fstat(file_.Get(), &status) != 0 || status.st_nlink > 0) {
-        throw std::system_error(EIO, std::generic_category(), "cannot remove " + path_ + ", which has no frame");
+    struct stat file {};
+    if (::fstat(file_.Get(), &file) != 0) {
+        base::ThrowErrno("cannot look at " + path_);
+    }
+    for (const std::filesystem::path& path : {archive::IndexPathOf(path_), std::filesystem::path(path_)}) {
+        archive::RemoveFile(path);
+        if (!IsGone(path, file.st_dev)) {
+            throw std::system_error(EIO, std::generic_category(), "cannot remove " + path.string());
+        }
     }
 }
 
@@ -198,8 +209,9 @@ void RecordingWriter::WriteOrFail(Step step) {
     }
 }
 
-void RecordingWriter::Sync() const {
+void RecordingWriter::Sync() {
     if (::fdatasync(file_.Get()) != 0) {
+        is_index_final_ = true;  // the next call would succeed, whatever became of the frames
         base::ThrowErrno("cannot write " + path_);
     }
 }

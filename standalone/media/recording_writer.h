@@ -82,7 +82,7 @@ class RecordingWriter {
     void End();
     void IndexWhatIsWhole();
     void Remove() const;
-    void Sync() const;
+    void Sync();
     void AppendToIndex();
 
     const std::string path_;
@@ -99,6 +99,7 @@ class RecordingWriter {
     std::int64_t flushed_us_;
     bool is_pending_ = false;
     bool has_failed_ = false;
+    bool is_index_final_ = false;  // after a failure: what is not in it by now is cut off
     bool is_finished_ = false;
     int frame_count_ = 0;
     std::int64_t latest_ms_ = 0;

@@ -26,7 +26,7 @@ constexpr std::int64_t kCutsAtOnce = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
 // Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk
-// that stays broken could not be unmounted; recovery finishes what is left.
+// that stays broken could not be unmounted.
 constexpr std::int64_t kFinishForUs = 60'000'000;
 constexpr std::size_t kMaxUnfinished = 4;
 // Split here even where no key frame comes or the next event has no number.
@@ -45,6 +45,9 @@ CameraRecorder::~CameraRecorder() {
     Close();
     finish_again_us_ = 0;
     FinishLeft();
+    while (!unfinished_.empty()) {
+        GiveUp(unfinished_.begin());
+    }
 }
 
 void CameraRecorder::Take(Frame frame) {
@@ -108,9 +111,19 @@ void CameraRecorder::FinishLeft() {
             left.event->Close();
             return true;
         } catch (const std::exception&) {
-            return now_us >= left.give_up_us;
+            return false;
         }
     });
+    while (!unfinished_.empty() && now_us >= unfinished_.front().give_up_us) {
+        GiveUp(unfinished_.begin());
+    }
+}
+
+void CameraRecorder::GiveUp(std::vector<Unfinished>::iterator left) {
+    base::LogWarning("event " + std::to_string(left->event->Start().id) + " of camera " + std::to_string(camera_) +
+                     " could not be finished: lookhaven verify --repair does it when the disk is well again");
+    left->event->GiveUp();
+    unfinished_.erase(left);
 }
 
 bool CameraRecorder::Flush(int event) {
@@ -267,7 +280,9 @@ void CameraRecorder::Pause(RecordingState state, const std::string& reason) {
         } catch (const std::exception& failure) {
             base::LogWarning(std::string("an event could not be finished yet: ") + failure.what());
             if (unfinished_.size() == kMaxUnfinished) {
-                unfinished_.erase(unfinished_.begin());
+                const auto without_frames =
+                    std::ranges::find_if(unfinished_, [](const Unfinished& left) { return !left.event->HasFrames(); });
+                GiveUp(without_frames != unfinished_.end() ? without_frames : unfinished_.begin());
             }
             unfinished_.push_back({std::move(event_), context_.monotonic_us() + kFinishForUs});
         }

@@ -87,6 +87,7 @@ class CameraRecorder {
     bool Guard(Work&& work);
     void Pause(maintenance::RecordingState state, const std::string& reason);
     void FinishLeft();
+    void GiveUp(std::vector<Unfinished>::iterator left);
 
     const int camera_;
     const RecorderContext context_;

@@ -75,11 +75,15 @@ void EventWriter::Flush() {
 
 void EventWriter::Close() {
     writer_.Close();
-    // Once, for retention may remove the event from then on.
+    GiveUp();
+    LogSeconds();
+}
+
+// Once, for retention may remove the event from then on.
+void EventWriter::GiveUp() {
     if (std::exchange(row_.recording, false)) {
         PutRow();
     }
-    LogSeconds();
 }
 
 // Rounded up to whole seconds, at least one: a search never finds an event without a duration.

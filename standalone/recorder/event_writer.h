@@ -41,8 +41,11 @@ class EventWriter {
     void Flush();
     // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
     // when the file cannot be finished, and may be called again later then; until it succeeds the row is that of an open
-    // event, which retention leaves alone and recovery finishes.
+    // event, which retention leaves alone.
     void Close();
+    // Finishes the row alone, for a file that cannot be: retention may remove it, verify can repair it.
+    void GiveUp();
+    bool HasFrames() const { return writer_.FrameCount() > 0; }
 
   private:
     std::int64_t EndS() const;

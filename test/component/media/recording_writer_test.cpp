@@ -213,6 +213,25 @@ TEST(RecordingWriter, AFullDiskLeavesWhatWasFlushed) {
         }
         std::filesystem::remove_all(folder / "day");
     }
+    // It fills up before the first flush: the clusters that are on it whole are kept.
+    const Clip& groups = MakeClip(kH264);
+    Record(groups, folder / "whole.mkv", true);
+    RecordingWriter writer(folder / "b.mkv", groups.format, 0, 1);
+    const struct rlimit half { std::filesystem::file_size(folder / "whole.mkv") * 6 / 10, before.rlim_max };
+    ::setrlimit(RLIMIT_FSIZE, &half);
+    EXPECT_THROW(
+        {
+            for (std::size_t i = 0; i < groups.packets.size(); ++i) {
+                writer.Write(groups.At(i));
+            }
+            writer.Flush();
+        },
+        WriteError);
+    writer.Close();
+    ::setrlimit(RLIMIT_FSIZE, &before);
+    EXPECT_THAT(writer.FrameCount(), testing::AllOf(testing::Ge(25), testing::Le(75)));
+    EXPECT_EQ(archive::RecordingReader(folder / "b.mkv").FrameCount(), writer.FrameCount());
+    EXPECT_EQ(Probe(folder / "b.mkv"), "h264," + std::to_string(writer.FrameCount()) + "\n");
     std::signal(SIGXFSZ, old_handler);
     EXPECT_THROW(RecordingWriter(folder / "gone" / "a.mkv", clip.format, 0, 1), WriteError);
     EXPECT_FALSE(std::filesystem::exists(folder / "gone"));
