@@ -78,12 +78,11 @@ class DoctorTest : public DemoTest {
         return [this, cameras] { maintenance::WriteRecordingStatus(base::Installation(home_), cameras); };
     }
     Mend Certificate(int days) {
-        return Shell(
-            "cd " + home_.string() +
-            "/tls && openssl req -new -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes "
-            "-subj /CN=nvr -keyout key.pem 2>/dev/null | openssl x509 -req -signkey key.pem -out certificate.pem "
-            "2>/dev/null -days " +
-            std::to_string(days));
+        return Shell("cd " + home_.string() +
+                     "/tls && openssl req -new -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes "
+                     "-subj /CN=nvr -keyout key.pem -out request.pem 2>/dev/null && "
+                     "openssl x509 -req -in request.pem -signkey key.pem -out certificate.pem 2>/dev/null -days " +
+                     std::to_string(days));
     }
 
     // The first command line that the outcome names as a remedy.
