@@ -243,7 +243,7 @@ TEST_F(LifecycleTest, AnotherStreamsSegmentUnderTheSameKeyIsLeftAlone) {
         ASSERT_EQ(::shmctl(ListSegments(installation_)[0].shm_id, IPC_STAT, &status), 0);
         key = status.shm_perm.__key;
     }
-    const int foreign = ::shmget(key, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | 0600);
+    const int foreign = ::shmget(key, kSmallBytes, IPC_CREAT | IPC_EXCL | 0600);
     ASSERT_GE(foreign, 0);
     const Attachment attachment(foreign);
     auto& head = *new (attachment.Address()) SegmentHead{};

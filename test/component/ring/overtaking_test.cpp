@@ -37,7 +37,7 @@ TEST_F(RingTest, AReaderOvertakenWhileItPinsGetsAnEntryThatIsStillThere) {
         for (std::uint64_t count = 1; count <= 152; ++count) {
             frames.push_back(MakeData(1'000, count));
         }
-        std::uint64_t written = 0;
+        std::size_t written = 0;
         const auto write = [&](int count) {
             for (; count > 0; --count) {
                 writer.Write({.data = frames[written++]});

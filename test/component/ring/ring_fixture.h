@@ -26,6 +26,7 @@ using test::WaitFor;
 const StreamFormat kMjpeg{"MJPEG", {}, 1280, 720, true};
 const StreamFormat kH264{"H264", {1, 2, 3}, 1280, 720, false};
 const Geometry kSmall{.index_slots = 64, .arena_bytes = 1 << 16};
+const auto kSmallBytes = static_cast<std::size_t>(SegmentBytes(kSmall));
 
 // An installation in a temporary folder; after the test it must have no segment left.
 class RingTest : public testing::Test {

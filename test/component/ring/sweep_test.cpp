@@ -55,8 +55,7 @@ TEST_F(SweepTest, OnlyUnfinishedSegmentsOfOursAreRemoved) {
          }) {
         SCOPED_TRACE(row.name);
         KilledChild creator([&] {
-            void* made =
-                ::shmat(::shmget(kUnusedRingKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | row.mode), nullptr, 0);
+            void* made = ::shmat(::shmget(kUnusedRingKey, kSmallBytes, IPC_CREAT | IPC_EXCL | row.mode), nullptr, 0);
             std::memcpy(static_cast<char*>(made) + row.written_offset, &row.written, sizeof row.written);
         });
         EXPECT_EQ(RemoveOrphans(installation_), 0U) << "its creator lives";
@@ -73,8 +72,8 @@ TEST_F(SweepTest, ARingUnderAnyRingKeyGoesWithItsWriter) {
     constexpr key_t kEarlierKey = 0x4c654321;
     KilledChild writer([&] {
         const Attachment ring = CreateSegment(installation_.Id(), kId, kMjpeg, kSmall);
-        void* earlier = ::shmat(::shmget(kEarlierKey, SegmentBytes(kSmall), IPC_CREAT | IPC_EXCL | 0600), nullptr, 0);
-        std::memcpy(earlier, ring.Address(), SegmentBytes(kSmall));
+        void* earlier = ::shmat(::shmget(kEarlierKey, kSmallBytes, IPC_CREAT | IPC_EXCL | 0600), nullptr, 0);
+        std::memcpy(earlier, ring.Address(), kSmallBytes);
         ring.RemoveSegment();
     });
     EXPECT_EQ(RemoveOrphans(installation_), 0U) << "it is written to";

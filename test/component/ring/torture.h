@@ -122,7 +122,7 @@ class TortureWriter {
 
     void WriteOnce(std::size_t max_bytes) {
         const std::uint64_t seed = random_();
-        const std::span<unsigned char> data(buffer_, 8 + seed % (max_bytes - 8));
+        const std::span<unsigned char> data(buffer_, 8 + static_cast<std::size_t>(seed % (max_bytes - 8)));
         Fill(data, seed);
         const bool is_written = writer_.Write(
             {.data = data, .is_key = written_++ % 10 == 0, .timestamp_micros = static_cast<std::int64_t>(seed)});
