@@ -20,9 +20,9 @@ if(LOOKHAVEN_SANITIZE)
     target_link_options(lookhaven_options INTERFACE -fsanitize=${LOOKHAVEN_SANITIZE} -Wl,--disable-new-dtags)
 endif()
 
-# Linking tests is much of a build, and lld takes a fraction of the time.
+# Linking tests is much of a build, and lld takes a fraction of the time; a cross compiler does not look for it.
 find_program(LOOKHAVEN_LLD ld.lld)
-if(LOOKHAVEN_TESTS AND LOOKHAVEN_LLD)
+if(LOOKHAVEN_TESTS AND LOOKHAVEN_LLD AND NOT CMAKE_CROSSCOMPILING)
     target_link_options(lookhaven_options INTERFACE -fuse-ld=lld)
 endif()
 
@@ -50,6 +50,7 @@ function(lookhaven_test name label)
     if(arg_BY_SUITE)
         set(entries ${CMAKE_CURRENT_BINARY_DIR}/${name}_suites.cmake)
         file(GENERATE OUTPUT ${entries} CONTENT "set(name ${name})\nset(program \"$<TARGET_FILE:${name}>\")
+set(emulator \"$<TARGET_PROPERTY:${name},CROSSCOMPILING_EMULATOR>\")
 set(properties ${properties})\ninclude(\"${CMAKE_SOURCE_DIR}/cmake/LookhavenSuites.cmake\")\n")
         set_property(DIRECTORY APPEND PROPERTY TEST_INCLUDE_FILES ${entries})
     else()
