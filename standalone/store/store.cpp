@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/store.h"
 
+#include <chrono>
 #include <filesystem>
+#include <string_view>
+#include <thread>
 #include <utility>
 
 #include <fcntl.h>
@@ -17,6 +20,8 @@ namespace lookhaven::store {
 namespace {
 
 constexpr std::size_t kInstallationIdBytes = 16;
+constexpr int kLogAttempts = 100;
+constexpr std::chrono::milliseconds kLogAttemptPause{50};
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
@@ -51,6 +56,20 @@ void CheckVersion(Connection& connection) {
     }
 }
 
+// SQLite never waits for the lock that this needs, so it is tried again for as long as it waits elsewhere.
+std::string SwitchToWriteAheadLog(const StoreAddress& address) {
+    for (int attempt = 1;; ++attempt) {
+        try {
+            return Connection(address).FetchOne<std::string>("pragma journal_mode = wal").value_or("");
+        } catch (const StoreError& failure) {
+            if (attempt == kLogAttempts || !std::string_view(failure.what()).ends_with("database is locked")) {
+                throw;
+            }
+            std::this_thread::sleep_for(kLogAttemptPause);
+        }
+    }
+}
+
 // SQLite's write-ahead log takes its mode from the file, so a private file keeps all of them private.
 void PrepareFile(const StoreAddress& address) {
     if (address.engine != Engine::kSqlite) {
@@ -61,7 +80,7 @@ void PrepareFile(const StoreAddress& address) {
     } catch (const std::system_error& error) {
         throw StoreError(error.what());
     }
-    if (Connection(address).FetchOne<std::string>("pragma journal_mode = wal") != "wal") {
+    if (SwitchToWriteAheadLog(address) != "wal") {
         throw StoreError("the record store's folder does not allow a write-ahead log: use a local file system");
     }
 }
