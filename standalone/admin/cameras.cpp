@@ -6,9 +6,11 @@
 #include <thread>
 
 #include "standalone/admin/change.h"
+#include "standalone/base/clock.h"
 #include "standalone/base/host_name.h"
 #include "standalone/base/local_time.h"
 #include "standalone/store/events.h"
+#include "standalone/store/footage_removals.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/text.h"
 
@@ -219,6 +221,9 @@ void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional
         const CameraSetup setup = ReadCamera(store, id);
         RequireCurrent(ToJson(setup), seen);
         store::Cameras(store).Remove(id);
+        if (footage == Footage::kRemove) {
+            store::FootageRemovals(store).Add(id, base::WallSeconds());
+        }
         Json::Value before = AuditJson(setup, false);
         before["footage"] = footage == Footage::kRemove ? "remove" : "keep";
         return Change{"camera.remove", Named(setup.camera.name, id), before, {}};

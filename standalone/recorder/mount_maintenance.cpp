@@ -9,6 +9,7 @@
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/recovery.h"
+#include "standalone/store/footage_removals.h"
 #include "standalone/store/kept_events.h"
 
 namespace lookhaven::recorder {
@@ -95,6 +96,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const int space_requests = context_.space_requests;
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
+        store::FootageRemovals(store).BeginDeletions();
         const maintenance::DeletionResult deleted = maintenance::EnforceRetention(
             store, mount,
             {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits, now_us},

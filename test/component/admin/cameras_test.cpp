@@ -6,9 +6,11 @@
 #include <thread>
 
 #include "standalone/admin/change.h"
+#include "standalone/base/clock.h"
 #include "standalone/camera/isolated_source.h"
 #include "standalone/store/audit_log.h"
 #include "standalone/store/events.h"
+#include "standalone/store/footage_removals.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/transaction.h"
 #include "standalone/store/users.h"
@@ -177,6 +179,16 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     EXPECT_EQ(events.List({.camera_ids = {removed}, .begin_s = -1}).size(), 1)
         << "of demo events, too, nothing is left";
     EXPECT_EQ(events.FootageOfCameras().at(removed).events, 1);
+    const int late = AddEvent(removed, true, false);
+    store::FootageRemovals removals(store_);
+    removals.BeginDeletions();
+    ASSERT_TRUE(events.Find(late)) << "the recorder still writes it";
+    events.Finish(late, 1, 1, 1);
+    removals.BeginDeletions();
+    EXPECT_FALSE(events.Find(late));
+    EXPECT_TRUE(events.Find(other) && events.Find(archived));
+    removals.Add(9, 2 * base::WallSeconds());
+    EXPECT_EQ(removals.Cameras(), std::vector<int>{9}) << "those of long ago are forgotten";
 }
 
 TEST_P(CameraChangeTest, AHostHasAThousandCamerasAtMost) {
