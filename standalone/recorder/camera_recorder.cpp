@@ -122,7 +122,7 @@ void CameraRecorder::FinishLeft() {
 void CameraRecorder::GiveUp(std::vector<Unfinished>::iterator left) {
     base::LogWarning("event " + std::to_string(left->event->Start().id) + " of camera " + std::to_string(camera_) +
                      " could not be finished: lookhaven verify --repair does it when the disk is well again");
-    left->event->GiveUp();
+    left->event->FinishRow();
     unfinished_.erase(left);
 }
 

@@ -75,12 +75,12 @@ void EventWriter::Flush() {
 
 void EventWriter::Close() {
     writer_.Close();
-    GiveUp();
+    FinishRow();
     LogSeconds();
 }
 
 // Once, for retention may remove the event from then on.
-void EventWriter::GiveUp() {
+void EventWriter::FinishRow() {
     if (std::exchange(row_.recording, false)) {
         PutRow();
     }

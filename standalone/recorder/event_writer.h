@@ -43,8 +43,8 @@ class EventWriter {
     // when the file cannot be finished, and may be called again later then; until it succeeds the row is that of an open
     // event, which retention leaves alone.
     void Close();
-    // Finishes the row alone, for a file that cannot be: retention may remove it, verify can repair it.
-    void GiveUp();
+    // Finishes the row alone, for a file that cannot be finished: retention may remove it, verify can repair it.
+    void FinishRow();
     bool HasFrames() const { return writer_.FrameCount() > 0; }
 
   private:

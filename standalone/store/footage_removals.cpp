@@ -4,6 +4,7 @@
 #include <sstream>
 #include <string>
 
+#include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/settings.h"
 
@@ -14,6 +15,7 @@ namespace {
 // Its value is, for each camera, its id and when it was removed, with spaces between.
 constexpr const char* kSetting = "footage_removals";
 constexpr std::int64_t kDayS = 86'400;
+constexpr int kMaxCameras = 1'000;
 
 }  // namespace
 
@@ -23,7 +25,7 @@ void FootageRemovals::Add(int camera, std::int64_t now_s) {
     std::string all = std::to_string(camera) + ' ' + std::to_string(now_s);
     int id = 0;
     std::int64_t removed_s = 0;
-    while (known >> id >> removed_s) {
+    for (int count = 1; count < kMaxCameras && known >> id >> removed_s; ++count) {
         if (now_s - removed_s < kDayS) {
             all += ' ' + std::to_string(id) + ' ' + std::to_string(removed_s);
         }
@@ -48,7 +50,7 @@ void FootageRemovals::BeginDeletions() {
         EventFilter any;
         any.camera_ids = {camera};
         any.limit = 1;
-        if (!events.List(any).empty()) {
+        if (!store::Cameras(store_).Find(camera) && !events.List(any).empty()) {
             events.BeginDeletionOfCamera(camera);
         }
     }

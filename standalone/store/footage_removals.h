@@ -15,10 +15,11 @@ class FootageRemovals {
     // The store must outlive this object.
     explicit FootageRemovals(Store& store) : store_(store) {}
 
-    // Call in the transaction that removes the camera. Forgets those of more than a day ago.
+    // Call in the transaction that removes the camera. Remembers the last thousand, for a day.
     void Add(int camera, std::int64_t now_s);
     std::vector<int> Cameras();
-    // Begins the deletion of what has come since. Kept recordings stay. Call it every few seconds.
+    // Begins the deletion of what has come since, but of no camera that there is. Kept recordings stay. Call it every few
+    // seconds.
     void BeginDeletions();
 
   private:

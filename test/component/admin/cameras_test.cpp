@@ -187,6 +187,11 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     removals.BeginDeletions();
     EXPECT_FALSE(events.Find(late));
     EXPECT_TRUE(events.Find(other) && events.Find(archived));
+    const int present = AddGate();
+    const int its = AddEvent(present, false, false);
+    removals.Add(present, base::WallSeconds());
+    removals.BeginDeletions();
+    EXPECT_TRUE(events.Find(its)) << "whatever is remembered, what a camera has stays while it is there";
     removals.Add(9, 2 * base::WallSeconds());
     EXPECT_EQ(removals.Cameras(), std::vector<int>{9}) << "those of long ago are forgotten";
 }
