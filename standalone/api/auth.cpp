@@ -2,7 +2,6 @@
 //
 // VEXO.Auth: log in, log out, who am I; and the first account of all.
 #include <filesystem>
-#include <initializer_list>
 #include <system_error>
 
 #include "standalone/admin/first_account.h"
@@ -31,15 +30,6 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
     data["is_manager"] = is_manager;
     data["players_per_session"] = PlayersPerSession(records);
     return data;
-}
-
-void RequireNotInQuery(const Call& call, std::initializer_list<const char*> names) {
-    const Parameters query = ReadQuery(call.request);
-    for (const char* name : names) {
-        if (query.contains(name)) {
-            throw Failure(400, std::string(name) + " belongs in the body: URLs end up in logs and browser histories");
-        }
-    }
 }
 
 std::string LoggedIn(const Call& call, const store::User& user, const store::NewSession& session) {

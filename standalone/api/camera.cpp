@@ -99,7 +99,7 @@ int RequireId(const Call& call) {
 }
 
 std::string Add(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     admin::CameraSetup setup;
     setup.camera.enabled = true;
     TakeCameraFields(call, setup);
@@ -108,7 +108,7 @@ std::string Add(const Call& call) {
 }
 
 std::string Set(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     const std::int64_t seen = SeenRevision(call);
     return OnCurrentRecord(Completer(call), [&] {
         return CameraAnswer(call,

@@ -106,13 +106,17 @@ store::HashedPassword Hash(const Call& call, const std::string& password) {
     return store::HashedPassword(password);
 }
 
-void RequireNoSecretInQuery(const Call& call) {
+void RequireNotInQuery(const Call& call, std::initializer_list<const char*> names) {
     const Parameters query = ReadQuery(call.request);
-    for (const char* name : {"password", "newPassword", "reauth"}) {
+    for (const char* name : names) {
         if (query.contains(name)) {
-            throw Failure(400, "passwords belong in the body: URLs end up in logs and browser histories");
+            throw Failure(400, std::string(name) + " belongs in the body: URLs end up in logs and browser histories");
         }
     }
+}
+
+void RequireNoPasswordInQuery(const Call& call) {
+    RequireNotInQuery(call, {"password", "newPassword", "reauth"});
 }
 
 }  // namespace lookhaven::api

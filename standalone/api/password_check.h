@@ -3,6 +3,7 @@
 // Passwords that a caller gives: each costs 64 MiB and a tenth of a second, and a wrong one slows down the next.
 #pragma once
 
+#include <initializer_list>
 #include <string>
 
 #include "standalone/api/call.h"
@@ -42,7 +43,9 @@ std::string RequireNewPassword(const Call& call, const std::string& parameter);
 // Throws Failure 503; store::InvalidRecord for what is no password.
 store::HashedPassword Hash(const Call& call, const std::string& password);
 
-// Throws Failure 400 for a password in the address, which ends up in logs and browser histories.
-void RequireNoSecretInQuery(const Call& call);
+// Throws Failure 400 for one of the parameters in the address, which ends up in logs and browser histories.
+void RequireNotInQuery(const Call& call, std::initializer_list<const char*> names);
+// The same for every password that a method takes.
+void RequireNoPasswordInQuery(const Call& call);
 
 }  // namespace lookhaven::api

@@ -53,7 +53,7 @@ Json::Value Describe(const Call& call, media::ProbeResult found) {
 }  // namespace
 
 std::string ProbeCamera(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     std::string address;
     bool is_insecure = false;
     int id = 0;

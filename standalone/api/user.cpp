@@ -122,7 +122,7 @@ admin::UserChange RightsOf(const Call& call) {
 }
 
 std::string Add(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     admin::UserChange change = RightsOf(call);
     const std::string password = RequireNewPassword(call, "password");
     Reauthenticate(call, "reauth");
@@ -131,7 +131,7 @@ std::string Add(const Call& call) {
 }
 
 std::string Set(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     const std::int64_t seen = SeenRevision(call);
     admin::UserChange change = RightsOf(call);
     std::optional<std::string> password;
@@ -150,7 +150,7 @@ std::string Set(const Call& call) {
 }
 
 std::string Remove(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     const std::int64_t seen = SeenRevision(call);
     Reauthenticate(call, "reauth");
     OnCurrentRecord(Completer(call), [&] { admin::RemoveUser(call.Records(), call.Actor(), IdOf(call), seen); });
@@ -211,7 +211,7 @@ std::string Preview(const Call& call) {
 }
 
 std::string ChangePassword(const Call& call) {
-    RequireNoSecretInQuery(call);
+    RequireNoPasswordInQuery(call);
     const std::string password = RequireNewPassword(call, "newPassword");
     const store::VerifiedUser user = Reauthenticate(call, "password");
     try {

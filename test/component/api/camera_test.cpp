@@ -48,7 +48,7 @@ TEST(CameraApi, AStoredPasswordGoesToNobodyNew) {
     }
     for (const char* method : {"Add", "Set", "Probe"}) {
         const host::Answer answer = ask(std::string(method) + "&password=s3cret", "{}");
-        EXPECT_NE(answer.body.find("passwords belong in the body"), std::string::npos) << method << answer.body;
+        EXPECT_NE(answer.body.find("password belongs in the body"), std::string::npos) << method << answer.body;
     }
 }
 
