@@ -3,6 +3,7 @@
 // lookhaven: the operator's command line.
 #include <iostream>
 #include <new>
+#include <string_view>
 #include <system_error>
 
 #include "standalone/admin/change.h"
@@ -11,6 +12,7 @@
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/completion.h"
 #include "standalone/media/source.h"
 #include "standalone/remote/certificate.h"
 
@@ -87,6 +89,12 @@ int Run(int argc, char** argv) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);
+    if (argc > 1 && argv[1] == std::string_view(kCompletionWord)) {
+        for (const std::string& candidate : CompletionsOf(program, {argv + 2, argv + argc})) {
+            std::cout << candidate << '\n';
+        }
+        return kOk;
+    }
     try {
         program.parse(argc, argv);
         return kOk;

@@ -1,0 +1,9 @@
+# SPDX-License-Identifier: Apache-2.0
+# fish completion for lookhaven(1)
+
+function __lookhaven_complete
+    set -l words (commandline --tokenize --cut-at-cursor --current-process)
+    set -l last (commandline --cut-at-cursor --current-token)
+    $words[1] __complete $words[2..-1] "$last" 2>/dev/null
+end
+complete --command lookhaven --arguments '(__lookhaven_complete)'
