@@ -2,6 +2,7 @@
 //
 // Recordings of every format, as ffprobe sees them; killed at any point, on a full disk, cut, without an index.
 #include <atomic>
+#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <random>
@@ -11,6 +12,8 @@
 #include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <sys/resource.h>
+#include <sys/syscall.h>
+#include <unistd.h>
 
 #include "standalone/archive/recording_reader.h"
 #include "standalone/archive/repair.h"
@@ -18,6 +21,22 @@
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/process.h"
+
+namespace {
+
+int failing_syncs = 0;
+
+}  // namespace
+
+// Stands in front of the C library's. Like Linux, it reports a lost write once: the next call succeeds.
+extern "C" int fdatasync(int descriptor) {
+    if (failing_syncs > 0) {
+        --failing_syncs;
+        errno = EIO;
+        return -1;
+    }
+    return static_cast<int>(::syscall(SYS_fdatasync, descriptor));
+}
 
 namespace lookhaven::test {
 namespace {
@@ -235,6 +254,32 @@ TEST(RecordingWriter, AFullDiskLeavesWhatWasFlushed) {
     std::signal(SIGXFSZ, old_handler);
     EXPECT_THROW(RecordingWriter(folder / "gone" / "a.mkv", clip.format, 0, 1), WriteError);
     EXPECT_FALSE(std::filesystem::exists(folder / "gone"));
+}
+
+// Whether they are on the disk nobody knows, though they can still be read from memory.
+TEST(RecordingWriter, FramesOfAFailedSyncAreNeverIndexed) {
+    const Clip& clip = MakeClip(kMjpeg);
+    for (const int flushed : {20, 0}) {
+        SCOPED_TRACE(flushed);
+        const ArchiveFolder folder;
+        const std::filesystem::path path = folder / "a.mkv";
+        RecordingWriter writer(path, clip.format, 0, 1);
+        for (int i = 0; i < flushed; ++i) {
+            writer.Write(clip.At(static_cast<std::size_t>(i)));
+        }
+        writer.Flush();
+        writer.Write(clip.At(static_cast<std::size_t>(flushed)));
+        failing_syncs = 1;
+        EXPECT_THROW(writer.Flush(), WriteError);
+        ASSERT_EQ(failing_syncs, 0) << "nothing was synced";
+        writer.Close();
+        EXPECT_EQ(writer.FrameCount(), flushed);
+        ASSERT_EQ(std::filesystem::exists(path), flushed > 0);
+        if (flushed > 0) {
+            EXPECT_EQ(archive::RecordingReader(path).FrameCount(), flushed);
+            EXPECT_EQ(Probe(path), "mjpeg," + std::to_string(flushed) + "\n");
+        }
+    }
 }
 
 TEST(CloseCrashed, SavesWhatIsWholeOfACutOrDamagedRecording) {

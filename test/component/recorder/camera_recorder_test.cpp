@@ -104,6 +104,30 @@ TEST_F(CameraRecorderTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsE
     EXPECT_EQ(recorder_.State(), RecordingState::kReady);
 }
 
+// Else retention would leave it alone for ever, and a full disk full.
+TEST_F(CameraRecorderTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinute) {
+    OpenStore();
+    Pass(2.48);
+    const int event = recorder_.OpenEvent();
+    fs::rename(MountPath(1), folder_ / "away");
+    recorder_.Close();
+    const auto is_open_in_store = [&] {
+        rows_.Refresh(4);
+        store::Store store = store::Store::Open(StoreUrl());
+        const auto row = store::Events(store).Find(event);
+        return row && row->recording;
+    };
+    ASSERT_TRUE(test::Eventually(std::chrono::seconds(5), is_open_in_store));
+    Pass(55, false);
+    ASSERT_TRUE(is_open_in_store()) << "the disk may come back";
+    Pass(10, false);
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return !is_open_in_store(); }));
+    fs::rename(folder_ / "away", MountPath(1));
+    Pass(3);
+    EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
+    EXPECT_NE(recorder_.OpenEvent(), event);
+}
+
 TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
     OpenStore();
     struct Row {
