@@ -9,9 +9,8 @@ import sys
 import tempfile
 import time
 
-from installation import call
 from record import start_cameras
-from stand import Stand
+from stand import Stand, call
 
 QUERY = "api=VEXO.Lookhaven.Player&version=1&method=LoadCamera"
 CAMERAS = 100

@@ -10,7 +10,7 @@ import subprocess
 import sys
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
-from installation import PASSWORDS, ROOT, Installation, descendants, free_port, wait_until
+from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, wait_until
 
 
 def cpu_nanos(pids):
