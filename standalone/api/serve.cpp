@@ -214,6 +214,16 @@ void PrepareToServe(const base::Installation& installation) try {
     // Opening the store fails likewise.
 }
 
+void PrepareProcess(const base::Installation& installation) try {
+    binding::RequestContext::Current().OpenRecordsAhead(installation);
+} catch (const std::exception&) {
+    // The request fails likewise.
+}
+
+bool NeedsCounters(const http::Request& request) {
+    return request.Header("QUERY_STRING").find("Metrics") != std::string_view::npos;
+}
+
 void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
     binding::Output output(STDOUT_FILENO, {}, [&slot] { return slot.MustEnd() || slot.player.is_excess; });
     LimitAddressSpace(kMaxAddressSpace);

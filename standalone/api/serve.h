@@ -27,6 +27,12 @@ struct Service {
 // Loads and binds what every request process would have to. Call it before they are forked. What fails, each of them
 // reports.
 void PrepareToServe(const base::Installation& installation);
+// Likewise in a process that waits for its request: opens the store, and touches the memory that most requests need.
+void PrepareProcess(const base::Installation& installation);
+
+// Whether the request may ask for the service's counters, of which each process has those of when it was forked. Not
+// exact: who disguises the name sees old ones.
+bool NeedsCounters(const http::Request& request);
 
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down
 // for writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.

@@ -4,12 +4,15 @@
 #include <algorithm>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 #include <malloc.h>
+#include <sys/stat.h>
 
 #include "platform/log/dbglogcfg.h"
 #include "standalone/base/log.h"
 #include "standalone/control/debug_log_config.h"
+#include "standalone/store/cameras.h"
 
 DbgLogCfg* g_pDbgLogCfg = nullptr;
 int g_DbgLogPid = 0;
@@ -21,14 +24,43 @@ static_assert(offsetof(DbgLogCfg, m_CategLevel) == offsetof(control::DebugLogCon
 static_assert(offsetof(DbgLogCfg, m_PidCount) == offsetof(control::DebugLogConfig, process_count));
 static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(control::DebugLogConfig, process));
 
+namespace {
+
+// Nothing for a store that is no file, or whose file is not there.
+std::optional<StoreFile> FileOf(const std::string& url) {
+    constexpr std::string_view kSqlite = "sqlite:";
+    struct stat file {};
+    if (!url.starts_with(kSqlite) || ::stat(url.c_str() + kSqlite.size(), &file) != 0) {
+        return std::nullopt;
+    }
+    return StoreFile{url, file.st_dev, file.st_ino};
+}
+
+}  // namespace
+
 RequestContext& RequestContext::Current() {
     // Never destroyed: a request process leaves by _exit, and what is here goes with it.
     static RequestContext& context = *new RequestContext;
     return context;
 }
 
+void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
+    const std::optional<StoreFile> file = FileOf(installation.StoreUrl());
+    auto records = std::make_unique<store::Store>(store::Store::Open(installation.StoreUrl()));
+    store::Users(*records).List();
+    store::Cameras(*records).List();
+    // A connection to a server may be gone when it is needed.
+    if (file) {
+        records_ = std::move(records);
+        opened_ahead_ = file;
+    }
+}
+
 void RequestContext::Begin(const base::Installation& installation, Output* output, RequestEvents events) {
     base::SetLogProgram("request");
+    if (opened_ahead_ && opened_ahead_ != FileOf(installation.StoreUrl())) {
+        records_.reset();
+    }
     installation_ = installation;
     output_ = output;
     events_ = std::move(events);

@@ -16,6 +16,8 @@
 #include <string>
 #include <vector>
 
+#include <sys/types.h>
+
 #include "platform/export.h"
 #include "standalone/base/installation.h"
 #include "standalone/binding/output.h"
@@ -66,6 +68,15 @@ struct RecordCache {
     std::optional<std::map<int, store::RecordingPlan>> plans;
 };
 
+// A file can be replaced by another one of the same name, as by restoring a backup.
+struct StoreFile {
+    std::string url;
+    dev_t device = 0;
+    ino_t number = 0;
+
+    bool operator==(const StoreFile&) const = default;
+};
+
 class LH_PLATFORM_API RequestContext {
   public:
     // The context of this process. Belongs to no installation until Begin.
@@ -74,6 +85,10 @@ class LH_PLATFORM_API RequestContext {
     RequestContext() = default;
     RequestContext(const RequestContext&) = delete;
     RequestContext& operator=(const RequestContext&) = delete;
+
+    // In a process that waits for its request: opens the store if that is a file, and goes once the way through it that
+    // requests go. Begin closes it when the installation has another store by then. Throws store::StoreError.
+    void OpenRecordsAhead(const base::Installation& installation);
 
     // Borrows output for the rest of the process's life, null where nothing is sent.
     void Begin(const base::Installation& installation, Output* output, RequestEvents events = {});
@@ -146,6 +161,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
+    std::optional<StoreFile> opened_ahead_;
     RecordCache cache_;
     unsigned int caller_ = 0;
     std::string session_;

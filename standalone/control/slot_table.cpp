@@ -53,6 +53,13 @@ std::span<Slot> SlotTable::Used() const {
     return slots_.first(guard_->used);
 }
 
+Slot& SlotTable::At(std::size_t number) const {
+    if (number >= slots_.size()) {
+        throw std::out_of_range("there is no such slot");
+    }
+    return slots_[number];
+}
+
 Slot* SlotTable::Take(std::size_t keep_free) {
     if (std::ranges::count(is_taken_, false) <= static_cast<std::ptrdiff_t>(keep_free)) {
         return nullptr;
@@ -85,7 +92,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
 
 void SlotTable::Free(Slot& slot) {
     slot.serial = 0;
-    is_taken_[static_cast<std::size_t>(&slot - slots_.data())] = false;
+    is_taken_[NumberOf(slot)] = false;
 }
 
 void SlotTable::KeepOnly(const Slot& slot) {

@@ -113,6 +113,9 @@ class SlotTable {
     // For the host: a slot for a new request, null when no more than that many are free.
     Slot* Take(std::size_t keep_free = 0);
     void Free(Slot& slot);
+    // The slot's number, the same in all processes, and back. Throws std::out_of_range.
+    std::size_t NumberOf(const Slot& slot) const { return static_cast<std::size_t>(&slot - slots_.data()); }
+    Slot& At(std::size_t number) const;
 
     // For a request process: sets the session of its slot. Throws std::length_error for a handle that is too long.
     static void SetSession(Slot& slot, std::string_view handle);

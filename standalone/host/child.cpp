@@ -1,15 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/host/child.h"
 
+#include <cerrno>
 #include <csignal>
 #include <cstdlib>
+#include <cstring>
 #include <exception>
 #include <filesystem>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
+#include <fcntl.h>
 #include <sys/prctl.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/log.h"
@@ -20,6 +26,7 @@ namespace lookhaven::host {
 namespace {
 
 constexpr int kWakeDescriptor = 3;
+constexpr int kKeptDescriptor = 4;
 
 // Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range; there may
 // be a thousand million numbers to try then, so it looks which are open.
@@ -40,29 +47,7 @@ void CloseFrom(int first) {
     }
 }
 
-}  // namespace
-
-void LeaveHost(pid_t host, control::SlotTable& slots, int standard_output) {
-    ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-    if (::getppid() != host) {
-        _exit(1);  // the host died before it could take us along
-    }
-    if (standard_output >= 0) {
-        ::dup2(standard_output, STDOUT_FILENO);
-    }
-    base::PreferAsOomVictim();
-    ::dup2(slots.WakeDescriptor(), kWakeDescriptor);
-    slots.SetWakeDescriptor(kWakeDescriptor);
-    CloseFrom(kWakeDescriptor + 1);
-    for (const int number : {SIGPIPE, SIGINT, SIGQUIT, SIGHUP, SIGUSR1, SIGUSR2}) {
-        std::signal(number, SIG_IGN);
-    }
-    sigset_t none;
-    sigemptyset(&none);
-    ::sigprocmask(SIG_SETMASK, &none, nullptr);
-}
-
-void RunAndExit(const std::function<void()>& work) {
+[[noreturn]] void RunAndExit(const std::function<void()>& work) {
     try {
         work();
         _exit(0);
@@ -72,6 +57,51 @@ void RunAndExit(const std::function<void()>& work) {
         base::LogError("a child process failed: an exception of unknown type");
     }
     _exit(1);
+}
+
+}  // namespace
+
+std::optional<Child> StartChild(const char* what, const std::function<void()>& work) {
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        RunAndExit(work);
+    }
+    base::FileDescriptor process(pid < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, pid, 0)));
+    if (!process) {
+        base::LogError(std::string("cannot start ") + what + ": " + std::strerror(errno));
+        if (pid > 0) {
+            ::kill(pid, SIGKILL);
+            ::waitpid(pid, nullptr, 0);
+        }
+        return std::nullopt;
+    }
+    return Child{pid, std::move(process)};
+}
+
+int LeaveHost(pid_t host, control::SlotTable& slots, int standard_output, int kept) {
+    ::prctl(PR_SET_PDEATHSIG, SIGKILL);
+    if (::getppid() != host) {
+        _exit(1);  // the host died before it could take us along
+    }
+    if (standard_output >= 0) {
+        ::dup2(standard_output, STDOUT_FILENO);
+    }
+    base::PreferAsOomVictim();
+    // Out of the way of the two numbers.
+    const int moved = kept < 0 ? -1 : ::fcntl(kept, F_DUPFD, kKeptDescriptor + 1);
+    ::dup2(slots.WakeDescriptor(), kWakeDescriptor);
+    slots.SetWakeDescriptor(kWakeDescriptor);
+    if (moved >= 0) {
+        ::dup2(moved, kKeptDescriptor);
+    }
+    CloseFrom(moved < 0 ? kKeptDescriptor : kKeptDescriptor + 1);
+    for (const int number : {SIGPIPE, SIGINT, SIGQUIT, SIGHUP, SIGUSR1, SIGUSR2}) {
+        std::signal(number, SIG_IGN);
+    }
+    sigset_t none;
+    sigemptyset(&none);
+    ::sigprocmask(SIG_SETMASK, &none, nullptr);
+    return moved < 0 ? -1 : kKeptDescriptor;
 }
 
 }  // namespace lookhaven::host

@@ -2,10 +2,8 @@
 #include "standalone/host/process_table.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <csignal>
 #include <cstdlib>
-#include <cstring>
 #include <fstream>
 #include <string>
 
@@ -16,7 +14,6 @@
 #include "standalone/base/log.h"
 #include "standalone/control/player_file.h"
 #include "standalone/control/progress_file.h"
-#include "standalone/host/child.h"
 
 namespace lookhaven::host {
 
@@ -47,25 +44,9 @@ bool IsPending(pid_t pid, int number) {
 
 }  // namespace
 
-std::optional<ProcessTable::Started> ProcessTable::Start(base::FileDescriptor& connection, control::Slot& slot,
-                                                         const std::function<void()>& run) {
-    const pid_t pid = ::fork();
-    if (pid == 0) {
-        RunAndExit(run);
-    }
-    base::FileDescriptor pidfd(pid < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, pid, 0)));
-    if (!pidfd) {
-        base::LogError(std::string("cannot start a request process: ") + std::strerror(errno));
-        if (pid > 0) {
-            ::kill(pid, SIGKILL);
-            ::waitpid(pid, nullptr, 0);
-        }
-        return std::nullopt;
-    }
-    const Started started{pid, pidfd.Get()};
+void ProcessTable::Add(Child child, base::FileDescriptor connection, control::Slot& slot) {
     processes_.insert_or_assign(
-        pid, Process{std::move(connection), std::move(pidfd), &slot, Clock::now(), std::nullopt, {}});
-    return started;
+        child.pid, Process{std::move(connection), std::move(child.process), &slot, Clock::now(), std::nullopt, {}});
 }
 
 void ProcessTable::HangUp(pid_t pid) {
@@ -95,11 +76,14 @@ void ProcessTable::BeginEnding(Process& process) {
     }
 }
 
-void ProcessTable::Reap(pid_t pid) {
+bool ProcessTable::Reap(pid_t pid) {
     const auto found = processes_.find(pid);
+    if (found == processes_.end()) {
+        return false;
+    }
     int status = 0;
-    if (found == processes_.end() || ::waitpid(pid, &status, WNOHANG) != pid) {
-        return;
+    if (::waitpid(pid, &status, WNOHANG) != pid) {
+        return true;
     }
     const bool is_crash = WIFSIGNALED(status) && WTERMSIG(status) != SIGTERM;
     if (is_crash) {
@@ -110,6 +94,7 @@ void ProcessTable::Reap(pid_t pid) {
     Sweep(pid, *found->second.slot);
     slots_.Free(*found->second.slot);
     processes_.erase(found);
+    return true;
 }
 
 void ProcessTable::Count(const Process& process, bool is_crash) {

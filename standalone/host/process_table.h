@@ -13,7 +13,6 @@
 
 #include <chrono>
 #include <filesystem>
-#include <functional>
 #include <map>
 #include <optional>
 
@@ -21,6 +20,7 @@
 
 #include "standalone/base/file_descriptor.h"
 #include "standalone/control/slot_table.h"
+#include "standalone/host/child.h"
 #include "standalone/http/request_counters.h"
 
 namespace lookhaven::host {
@@ -43,14 +43,8 @@ class ProcessTable {
           counters_(counters),
           progress_folder_(std::move(progress_folder)) {}
 
-    struct Started {
-        pid_t pid;
-        int pidfd;  // readable once the process has ended; then call Reap
-    };
-    // Forks a process that calls run and ends, and takes the connection. Nothing, and the connection is still the
-    // caller's, when no process can be started. Call it with all signals blocked.
-    std::optional<Started> Start(base::FileDescriptor& connection, control::Slot& slot,
-                                 const std::function<void()>& run);
+    // The process serves the connection's request from now on. When it has ended, call Reap.
+    void Add(Child child, base::FileDescriptor connection, control::Slot& slot);
 
     // The process's client is gone: ends the process.
     void HangUp(pid_t pid);
@@ -59,8 +53,8 @@ class ProcessTable {
     void EndMarked();
     // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
-    // The process has ended: counts its request, sweeps what it left and frees its slot.
-    void Reap(pid_t pid);
+    // The process has ended: counts its request, sweeps what it left and frees its slot. False when it is none of these.
+    bool Reap(pid_t pid);
 
     // Sends what is due; returns when to come again.
     Clock::time_point SendDueSignals(Clock::time_point now);

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <string>
 
 namespace lookhaven::host {
 
@@ -117,6 +118,29 @@ void ScgiParser::ParseContentLength() {
 void ScgiParser::Fail(std::string_view problem) {
     state_ = State::kMalformed;
     problem_ = problem;
+}
+
+std::string ToScgi(const http::Request& request) {
+    constexpr std::string_view kFirst = "CONTENT_LENGTH";
+    const auto bytes_of = [](std::string_view name, std::string_view value) { return name.size() + value.size() + 2; };
+    std::size_t head_bytes = 0;
+    for (const auto& [name, value] : request.headers) {
+        head_bytes += bytes_of(name, value);
+    }
+    std::string text;
+    // At once, for a text that grows leaves copies behind.
+    text.reserve(head_bytes + request.body.size() + 16);
+    text.append(std::to_string(head_bytes)).append(1, ':');
+    const auto add = [&text](std::string_view name, std::string_view value) {
+        text.append(name).append(1, '\0').append(value).append(1, '\0');
+    };
+    add(kFirst, request.Header(kFirst));
+    for (const auto& [name, value] : request.headers) {
+        if (name != kFirst) {
+            add(name, value);
+        }
+    }
+    return text.append(1, ',').append(request.body);
 }
 
 }  // namespace lookhaven::host

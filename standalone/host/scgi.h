@@ -57,4 +57,7 @@ class ScgiParser {
     std::string_view problem_;
 };
 
+// The request as a parser takes it, without the part of its body that is unread. Holds its secrets: overwrite it.
+std::string ToScgi(const http::Request& request);
+
 }  // namespace lookhaven::host

@@ -9,13 +9,13 @@
 #include <sys/epoll.h>
 #include <sys/signalfd.h>
 #include <sys/socket.h>
-#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/control/player_file.h"
+#include "standalone/host/signals.h"
 #include "standalone/http/answer.h"
 
 namespace lookhaven::host {
@@ -24,6 +24,7 @@ namespace {
 
 constexpr std::chrono::seconds kRefusalLingers{1};
 constexpr std::chrono::seconds kWatcherRestart{1};
+constexpr std::chrono::seconds kSpareRestart{1};
 constexpr std::chrono::milliseconds kAcceptAgain{200};
 
 int MillisUntil(Clock::time_point due) {
@@ -41,28 +42,6 @@ bool LooksLikeLogIn(const http::Request& request) {
            request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
 }
 
-// Whoever started this process may have it ignore signals; request processes inherit that.
-void StopIgnoringSignals() {
-    for (int number = 1; number < NSIG; ++number) {
-        struct sigaction inherited {};
-        if (::sigaction(number, nullptr, &inherited) == 0 && inherited.sa_handler == SIG_IGN) {
-            std::signal(number, SIG_DFL);
-        }
-    }
-}
-
-base::FileDescriptor BlockSignals() {
-    StopIgnoringSignals();
-    sigset_t all;
-    sigfillset(&all);
-    ::sigprocmask(SIG_SETMASK, &all, nullptr);
-    sigset_t ending;
-    sigemptyset(&ending);
-    sigaddset(&ending, SIGTERM);
-    sigaddset(&ending, SIGINT);
-    return base::FileDescriptor(::signalfd(-1, &ending, SFD_CLOEXEC | SFD_NONBLOCK));
-}
-
 }  // namespace
 
 Server::Server(const base::Installation& installation, Callbacks callbacks, Listener& listener,
@@ -72,6 +51,15 @@ Server::Server(const base::Installation& installation, Callbacks callbacks, List
       counters_(counters),
       slots_(limits.requests),
       processes_(limits.processes, slots_, counters, installation.ProgressFolder()),
+      spares_(limits.spare_processes, slots_,
+              {.leave_host =
+                   [this, host = ::getpid()](int channel) {
+                       connections_.clear();
+                       return LeaveHost(host, slots_, -1, channel);
+                   },
+               .prepare = callbacks_.prepare_process,
+               .serve = [this](http::Request& request,
+                               control::Slot& slot) { callbacks_.serve_request(request, slots_, slot); }}),
       listener_(listener),
       poll_(::epoll_create1(EPOLL_CLOEXEC)),
       signals_(BlockSignals()) {
@@ -130,7 +118,7 @@ void Server::Handle(Kind kind, std::uint32_t id) {
     case Kind::kHangUp:
         return processes_.HangUp(static_cast<pid_t>(id));
     case Kind::kProcess:
-        return processes_.Reap(static_cast<pid_t>(id));
+        return Reap(static_cast<pid_t>(id));
     }
 }
 
@@ -210,48 +198,74 @@ void Server::StartRequest(Connection connection) {
         request.Wipe();
         return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
     }
-    const auto process = processes_.Start(connection.socket, *slot, [&, host = ::getpid()] {
-        connections_.clear();  // others' requests, and their descriptors, whose numbers are given anew after this
-        LeaveHost(host, slots_, number);
-        callbacks_.serve_request(request, slots_, *slot);
-    });
+    std::optional<Child> child = StartRequestProcess(request, number, *slot);
     request.Wipe();
-    if (!process) {
+    if (!child) {
         slots_.Free(*slot);
         return Refuse(connections_[number] = std::move(connection), 503, "cannot start a request process");
     }
-    Watch(process->pidfd, Kind::kProcess, static_cast<std::uint32_t>(process->pid), EPOLLIN);
+    const pid_t pid = child->pid;
+    processes_.Add(*std::move(child), std::move(connection.socket), *slot);
     // Once: the connection stays open, and hung up, until the process is gone.
-    Watch(number, Kind::kHangUp, static_cast<std::uint32_t>(process->pid), EPOLLONESHOT);
+    Watch(number, Kind::kHangUp, static_cast<std::uint32_t>(pid), EPOLLONESHOT);
+}
+
+std::optional<Child> Server::StartRequestProcess(http::Request& request, int connection, control::Slot& slot) {
+    if (!callbacks_.needs_fork(request)) {
+        if (std::optional<Child> spare = spares_.HandOver(request, connection, slot)) {
+            spare_due_ = std::min(spare_due_, Clock::now());
+            return spare;
+        }
+    }
+    std::optional<Child> child = StartChild("a request process", [&, host = ::getpid()] {
+        connections_.clear();  // others' requests, and their descriptors, whose numbers are given anew after this
+        LeaveHost(host, slots_, connection);
+        callbacks_.serve_request(request, slots_, slot);
+    });
+    if (child) {
+        Watch(child->process.Get(), Kind::kProcess, static_cast<std::uint32_t>(child->pid), EPOLLIN);
+    }
+    return child;
+}
+
+void Server::StartSpare() {
+    spare_due_ = Clock::time_point::max();
+    if (spares_.IsFull()) {
+        return;
+    }
+    const Child* spare = spares_.Start();
+    if (spare != nullptr) {
+        Watch(spare->process.Get(), Kind::kProcess, static_cast<std::uint32_t>(spare->pid), EPOLLIN);
+    }
+    spare_due_ = Clock::now() + (spare == nullptr ? Clock::duration(kSpareRestart) : Clock::duration(0));
+}
+
+void Server::Reap(pid_t pid) {
+    if (!processes_.Reap(pid) && spares_.Reap(pid)) {
+        spare_due_ = Clock::now() + kSpareRestart;
+    }
 }
 
 void Server::StartWatcher() {
     watcher_due_ = Clock::time_point::max();
-    const pid_t host = ::getpid();
-    watcher_pid_ = ::fork();
-    if (watcher_pid_ == 0) {
-        RunAndExit([&] {
-            LeaveHost(host, slots_, -1);
-            callbacks_.watch_sessions(slots_);
-        });
-    }
-    watcher_.Reset(watcher_pid_ < 0 ? -1 : static_cast<int>(::syscall(SYS_pidfd_open, watcher_pid_, 0)));
+    watcher_ = StartChild("the session watcher", [this, host = ::getpid()] {
+        connections_.clear();
+        LeaveHost(host, slots_, -1);
+        callbacks_.watch_sessions(slots_);
+    });
     if (!watcher_) {
-        base::LogError("cannot start the session watcher");
-        EndWatcher();
         watcher_due_ = Clock::now() + kWatcherRestart;
         return;
     }
-    Watch(watcher_.Get(), Kind::kWatcher, 0, EPOLLIN);
+    Watch(watcher_->process.Get(), Kind::kWatcher, 0, EPOLLIN);
 }
 
 void Server::EndWatcher() {
-    if (watcher_pid_ > 0) {
-        ::kill(watcher_pid_, SIGKILL);
-        ::waitpid(watcher_pid_, nullptr, 0);
+    if (watcher_) {
+        ::kill(watcher_->pid, SIGKILL);
+        ::waitpid(watcher_->pid, nullptr, 0);
     }
-    watcher_pid_ = 0;
-    watcher_.Reset();
+    watcher_.reset();
 }
 
 void Server::BeginShutdown() {
@@ -259,7 +273,8 @@ void Server::BeginShutdown() {
     [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
     ending_ = true;
     base::TellStopping();
-    watcher_due_ = accept_due_ = Clock::time_point::max();
+    watcher_due_ = spare_due_ = accept_due_ = Clock::time_point::max();
+    spares_.EndAll();
     listener_.Close();
     connections_.clear();
     processes_.EndAll();
@@ -270,6 +285,9 @@ Clock::time_point Server::DoWhatIsDue() {
     if (now >= watcher_due_ && !ending_) {
         StartWatcher();
     }
+    if (now >= spare_due_ && !ending_) {
+        StartSpare();
+    }
     if (now >= accept_due_ && !ending_) {
         Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
         accept_due_ = Clock::time_point::max();
@@ -278,7 +296,8 @@ Clock::time_point Server::DoWhatIsDue() {
         base::TellAlive();
         alive_due_ = now + alive_interval_;
     }
-    Clock::time_point next = std::min({processes_.SendDueSignals(now), watcher_due_, accept_due_, alive_due_});
+    Clock::time_point next =
+        std::min({processes_.SendDueSignals(now), watcher_due_, spare_due_, accept_due_, alive_due_});
     for (auto at = connections_.begin(); at != connections_.end();) {
         Connection& connection = at->second;
         if (now >= connection.until && !connection.refused) {

@@ -12,6 +12,7 @@
 #include <cstdint>
 #include <functional>
 #include <map>
+#include <optional>
 #include <string>
 
 #include "standalone/base/file_descriptor.h"
@@ -22,6 +23,7 @@
 #include "standalone/host/listener.h"
 #include "standalone/host/process_table.h"
 #include "standalone/host/scgi.h"
+#include "standalone/host/spare_processes.h"
 #include "standalone/http/request.h"
 #include "standalone/http/request_counters.h"
 
@@ -29,8 +31,12 @@ namespace lookhaven::host {
 
 // What the host calls, given by the program.
 struct Callbacks {
-    // In a process of its own after LeaveHost: answers the request on standard output.
+    // In a process of its own after LeaveHost, before or after prepare_process: answers the request on standard output.
     std::function<void(http::Request&, control::SlotTable&, control::Slot&)> serve_request;
+    // In a process that waits for a request: what most of them need. May take long.
+    std::function<void()> prepare_process;
+    // In the host: whether the request must see what the host's memory holds now, as the counters.
+    std::function<bool(const http::Request&)> needs_fork;
     // In a process of its own after LeaveHost: marks the slots whose session has ended elsewhere, again and again; does
     // not return.
     std::function<void(control::SlotTable&)> watch_sessions;
@@ -41,6 +47,7 @@ struct Callbacks {
 struct ServerLimits {
     std::size_t requests = 256;              // running at once …
     std::size_t kept_for_log_in = 0;         // … of them
+    std::size_t spare_processes = 4;         // started ahead
     std::chrono::milliseconds read{10'000};  // from accepting a connection to the request's last byte
     ProcessLimits processes;
 };
@@ -73,6 +80,9 @@ class Server {
     void Read(int socket);
     void Refuse(Connection& connection, int status, const std::string& message);
     void StartRequest(Connection connection);
+    std::optional<Child> StartRequestProcess(http::Request& request, int connection, control::Slot& slot);
+    void StartSpare();
+    void Reap(pid_t pid);
     void StartWatcher();
     void BeginShutdown();
     void EndWatcher();
@@ -83,14 +93,15 @@ class Server {
     http::RequestCounters& counters_;
     control::SlotTable slots_;
     ProcessTable processes_;
+    SpareProcesses spares_;
     std::map<int, Connection> connections_;
     Listener& listener_;
     base::FileDescriptor poll_;
     base::FileDescriptor signals_;
-    base::FileDescriptor watcher_;  // pidfd
-    pid_t watcher_pid_ = 0;
+    std::optional<Child> watcher_;
     Clock::time_point watcher_due_ = Clock::time_point::min();  // when to start it
-    Clock::time_point accept_due_ = Clock::time_point::max();   // when to listen again
+    Clock::time_point spare_due_ = Clock::time_point::min();
+    Clock::time_point accept_due_ = Clock::time_point::max();  // when to listen again
     const std::chrono::milliseconds alive_interval_ = base::AliveInterval();
     Clock::time_point alive_due_ = Clock::time_point::min();
     bool ending_ = false;

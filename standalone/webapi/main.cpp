@@ -58,6 +58,8 @@ void Describe(CLI::App& app, Options& options) {
     app.add_option("--max-searches-per-user", options.requests.searches_per_user,
                    "of an account's, searches; more wait")
         ->check(CLI::Range(1, 4096));
+    app.add_option("--spare-processes", options.limits.spare_processes, "processes that wait for a request each")
+        ->check(CLI::Range(0, 64));
     AddMillis(app, "--read-seconds", options.limits.read, "for a request to arrive");
     AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is no stream");
     AddMillis(app, "--leave-seconds", options.limits.processes.leave, "for a process that was told to end");
@@ -91,6 +93,8 @@ void Run(const Options& options) {
                 filter.Close();
                 api::ServeRequest(service, request, slots, slot);
             },
+        .prepare_process = [&] { api::PrepareProcess(installation); },
+        .needs_fork = [](const http::Request& request) { return api::NeedsCounters(request); },
         .watch_sessions = [&](control::SlotTable& slots) { api::WatchSessions(installation, slots, filter); },
         .may_have_session = [&](const http::Request& request) { return filter.MayHaveSession(request); }};
     host::Server server(installation, callbacks, listener, counters, options.limits);

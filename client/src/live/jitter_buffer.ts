@@ -4,8 +4,11 @@
 //
 // Algorithm     Nothing plays until the target amount is buffered. Then samples go out at the rate they came in, inaudibly
 //               faster or slower, by one per cent, where the amount grows or shrinks, since no two clocks agree. Where it
-//               grows all the same, the oldest is dropped, so that audio is never late by more than a moment. After an
-//               underrun the target grows.
+//               grows all the same, the oldest is dropped, so that audio is never late by more than a moment.
+//
+// Target        One chunk, since the next comes only when it is complete, and what the network and two threads add. After an
+//               underrun it grows; after half a minute without one it shrinks again, so that one bad moment does not
+//               delay video and audio for hours.
 
 export interface AudioChunk {
   /** Stream time of the first sample, µs. */
@@ -16,8 +19,10 @@ export interface AudioChunk {
   channels: Float32Array[];
 }
 
-const kBaseDelayMs = 80;
+const kBaseDelayMs = 40;
 const kStepAfterGapMs = 40;
+const kStepBackMs = 20;
+const kCalmSeconds = 30;
 const kMaxExtraMs = 400;
 const kMaxSurplusMs = 250;
 /** Timestamps that jump further than this belong to another stream. */
@@ -34,7 +39,11 @@ export class JitterBuffer {
   #at = 0;
   #playing = false;
   #maxChunkMs = 0;
-  #extraMs = 0;
+  /** Beyond the base: because of underruns, and because the video comes later. */
+  #afterGapsMs = 0;
+  #postponedMs = 0;
+  /** Played since the last underrun. */
+  #calmSeconds = 0;
 
   constructor(outputRate: number) {
     this.#outputRate = outputRate;
@@ -59,11 +68,14 @@ export class JitterBuffer {
     if (!this.#playing || !first) return null;
     const startUs = first.timestampUs + (this.#at / first.rate) * 1e6;
     const speed = this.#speed(bufferedMs);
-    for (let index = 0; index < (output[0]?.length ?? 0); index += 1) {
+    const length = output[0]?.length ?? 0;
+    this.#noteCalm(length / this.#outputRate);
+    for (let index = 0; index < length; index += 1) {
       const chunk = this.#chunks[0];
       if (!chunk) {
         this.#playing = false;
-        this.postpone(kStepAfterGapMs);
+        this.#calmSeconds = 0;
+        this.#afterGapsMs = Math.min(this.#afterGapsMs + kStepAfterGapMs, kMaxExtraMs);
         break;
       }
       output.forEach((channel, number) => (channel[index] = this.#sample(chunk, number)));
@@ -72,16 +84,23 @@ export class JitterBuffer {
     return startUs;
   }
 
-  /** Delays the audio by this much more, up to a limit. */
+  /** Delays the audio by this much more, up to a limit, for good. */
   postpone(milliseconds: number): void {
-    const extraMs = Math.min(this.#extraMs + milliseconds, kMaxExtraMs);
+    const postponedMs = Math.min(this.#postponedMs + milliseconds, kMaxExtraMs);
     // Nothing plays until more is buffered.
-    if (extraMs > this.#extraMs) this.#playing = false;
-    this.#extraMs = extraMs;
+    if (postponedMs > this.#postponedMs) this.#playing = false;
+    this.#postponedMs = postponedMs;
+  }
+
+  #noteCalm(seconds: number): void {
+    this.#calmSeconds += seconds;
+    if (this.#calmSeconds < kCalmSeconds) return;
+    this.#calmSeconds = 0;
+    this.#afterGapsMs = Math.max(this.#afterGapsMs - kStepBackMs, 0);
   }
 
   #targetMs(): number {
-    return kBaseDelayMs + 2 * this.#maxChunkMs + this.#extraMs;
+    return kBaseDelayMs + this.#maxChunkMs + Math.min(this.#afterGapsMs + this.#postponedMs, kMaxExtraMs);
   }
 
   #bufferedMs(): number {

@@ -34,7 +34,7 @@ class Player {
 
 test("jitter: plays without a gap once enough is here, every sample once", () => {
   const player = new Player();
-  player.push(5);
+  player.push(2);
   expect(player.pull(2)).toEqual([null, null]);
   player.push(1);
   const heard: number[] = [];
@@ -47,14 +47,26 @@ test("jitter: plays without a gap once enough is here, every sample once", () =>
   expect(heard).toEqual(heard.map((_, index) => index));
 });
 
-test("jitter: after running dry it gathers more than before", () => {
+test("jitter: after running dry it gathers more than before, and less again when nothing runs dry for minutes", () => {
   const player = new Player();
-  player.push(6);
-  expect(player.pull(14).map((at) => at !== null)).toEqual([...Array<boolean>(13).fill(true), false]);
-  player.push(7);
-  expect(player.pull(1)).toEqual([null]);
-  player.push(1);
-  expect(player.pull(1)).toEqual([120]);
+  const runDry = () => player.pull(60).lastIndexOf(null) >= 0;
+  const gathered = () => {
+    let pieces = 0;
+    for (; player.pull(1)[0] === null; pieces += 1) player.push(1);
+    return pieces;
+  };
+  const before = gathered();
+  expect(runDry()).toBe(true);
+  const after = gathered();
+  expect(after - before, "pieces of 20 ms").toBe(2);
+  let delayMs = 0;
+  for (let turn = 0; turn < 8000; turn += 1) {
+    player.push(1);
+    const [, at] = player.pull(2);
+    expect(at).not.toBeNull();
+    delayMs = (turn + 1) * 20 - at!;
+  }
+  expect(delayMs).toBeLessThan(before * 20 * 1.3 + 20);
 });
 
 test.each([

@@ -5,6 +5,7 @@
 #include <array>
 #include <chrono>
 #include <csignal>
+#include <iterator>
 #include <random>
 
 #include <dlfcn.h>
@@ -12,6 +13,7 @@
 #include <sys/socket.h>
 #include <sys/wait.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/process.h"
 #include "standalone/host/child.h"
 #include "standalone/host/listener.h"
@@ -40,6 +42,8 @@ namespace lookhaven::host {
 namespace {
 
 using namespace std::chrono_literals;
+
+constexpr std::size_t kSpares = 4;
 
 TEST(Host, EndsProcessesWhoseClientLeft) {
     const HostUnderTest host({"--leave-seconds", "0.5"});
@@ -89,7 +93,8 @@ TEST_F(RunningHost, LeavesNothingAfterCutConnections) {
                                            {"QUERY_STRING", "api=Test&version=1&method=Stream"},
                                            {"HTTP_COOKIE", "id=" + admin_}});
     ASSERT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 200);
-    ASSERT_TRUE(Eventually(2s, [&] { return host_.RequestProcesses() == 0; }));
+    const auto is_at_rest = [&] { return host_.RequestProcesses() == 0 && host_.SpareProcesses().size() == kSpares; };
+    ASSERT_TRUE(Eventually(2s, is_at_rest));
     std::size_t descriptors = host_.Descriptors();
     Eventually(200ms, [&] {  // until the host has closed those of the process that has ended
         descriptors = std::min(descriptors, host_.Descriptors());
@@ -105,7 +110,7 @@ TEST_F(RunningHost, LeavesNothingAfterCutConnections) {
             recv(connection.Get(), block.data(), block.size(), 0);
         }
     }
-    EXPECT_TRUE(Eventually(5s, [&] { return host_.RequestProcesses() == 0; }));
+    EXPECT_TRUE(Eventually(5s, is_at_rest));
     EXPECT_TRUE(Eventually(2s, [&] { return host_.Descriptors() == descriptors; }))
         << host_.Descriptors() << " instead of " << descriptors;
 }
@@ -114,8 +119,10 @@ TEST(Host, TakesItsProcessesAlong) {
     for (const int signal : {SIGKILL, SIGTERM}) {
         HostUnderTest host;
         const base::FileDescriptor stream = OpenStream(host, host.LogIn().secret);
-        const std::vector<pid_t> children = host.Children();
+        std::vector<pid_t> children = host.Children();
         ASSERT_EQ(children.size(), 2U) << "the stream and the watcher";
+        ASSERT_TRUE(Eventually(2s, [&] { return host.SpareProcesses().size() == kSpares; }));
+        std::ranges::copy(host.SpareProcesses(), std::back_inserter(children));
         const std::filesystem::path socket = host.Home().WebApiSocket();
         const int status = host.End(signal);
         EXPECT_TRUE(Eventually(2s, [&] { return IsOver(stream); }));
@@ -127,6 +134,41 @@ TEST(Host, TakesItsProcessesAlong) {
             EXPECT_FALSE(std::filesystem::exists(socket));
         }
     }
+}
+
+TEST_F(RunningHost, GivesRequestsToProcessesThatWait) {
+    const auto is_full = [&] { return host_.SpareProcesses().size() == kSpares; };
+    ASSERT_TRUE(Eventually(5s, is_full));
+    // One that is not ready yet is left alone.
+    EXPECT_TRUE(Eventually(5s, [&] {
+        const std::vector<pid_t> spares = host_.SpareProcesses();
+        const base::FileDescriptor stream = OpenStream(host_, admin_);
+        return std::ranges::any_of(host_.Children(),
+                                   [&](pid_t child) { return std::ranges::count(spares, child) == 1; });
+    }));
+    ASSERT_TRUE(Eventually(5s, is_full)) << "others take their places";
+    const std::vector<pid_t> killed = host_.SpareProcesses();
+    for (const pid_t spare : killed) {
+        kill(spare, SIGKILL);
+    }
+    EXPECT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 200);
+    EXPECT_TRUE(Eventually(10s, is_full));
+    for (const pid_t spare : host_.SpareProcesses()) {
+        EXPECT_EQ(std::ranges::count(killed, spare), 0);
+    }
+}
+
+TEST_F(RunningHost, AProcessThatWaitedServesTheStoreThatThereIsNow) {
+    ASSERT_TRUE(Eventually(5s, [&] { return host_.SpareProcesses().size() == kSpares; }));
+    ASSERT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 200);
+    const std::string moved = "sqlite:" + (host_.Home().Home() / "moved.db").string();
+    store::Store::Migrate(moved);
+    store::Store records = store::Store::Open(moved);
+    const int user = store::Users(records).Add("moved", "right password", store::Privilege::kOwner).id;
+    const store::NewSession session = store::Sessions(records).Create(user, base::WallSeconds());
+    host_.Home().SetStoreUrl(moved);
+    EXPECT_EQ(host_.Ask("api=Test&version=1&method=Success", session.secret).status, 200);
+    EXPECT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 401);
 }
 
 TEST(LeaveHost, ClosesWhatTheHostHasOpenOnOldKernelsToo) {

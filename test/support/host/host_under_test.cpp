@@ -56,6 +56,18 @@ int ListenFor(const std::filesystem::path& path) {
     _exit(127);
 }
 
+std::vector<pid_t> ChildrenOf(pid_t host, bool are_spare) {
+    const std::string pid = std::to_string(host);
+    std::ifstream list("/proc/" + pid + "/task/" + pid + "/children");
+    std::vector<pid_t> children{std::istream_iterator<pid_t>(list), {}};
+    std::erase_if(children, [are_spare](pid_t child) {
+        std::string name;
+        std::getline(std::ifstream("/proc/" + std::to_string(child) + "/comm"), name);
+        return (name == "webapi-spare") != are_spare;
+    });
+    return children;
+}
+
 }  // namespace
 
 Json::Value Answer::Json() const {
@@ -157,9 +169,11 @@ Answer HostUnderTest::ReadAnswer(const base::FileDescriptor& connection) {
 }
 
 std::vector<pid_t> HostUnderTest::Children() const {
-    const std::string pid = std::to_string(pid_);
-    std::ifstream list("/proc/" + pid + "/task/" + pid + "/children");
-    return {std::istream_iterator<pid_t>(list), {}};
+    return ChildrenOf(pid_, false);
+}
+
+std::vector<pid_t> HostUnderTest::SpareProcesses() const {
+    return ChildrenOf(pid_, true);
 }
 
 std::size_t HostUnderTest::RequestProcesses() const {

@@ -55,7 +55,9 @@ class HostUnderTest {
 
     // The host's children without its watcher, and its open descriptors.
     std::size_t RequestProcesses() const;
+    // Without those that still wait for a request.
     std::vector<pid_t> Children() const;
+    std::vector<pid_t> SpareProcesses() const;
     std::size_t Descriptors() const;
     // Ends the host by the signal; returns its wait status.
     int End(int signal);
