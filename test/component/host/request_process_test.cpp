@@ -151,6 +151,8 @@ TEST_F(RunningHost, GivesRequestsToProcessesThatWait) {
     for (const pid_t spare : killed) {
         kill(spare, SIGKILL);
     }
+    // A request that was given to one before is lost with it.
+    ASSERT_TRUE(Eventually(5s, [&] { return host_.SpareProcesses().empty(); }));
     EXPECT_EQ(host_.Ask("api=Test&version=1&method=Success", admin_).status, 200);
     EXPECT_TRUE(Eventually(10s, is_full));
     for (const pid_t spare : host_.SpareProcesses()) {
