@@ -6,7 +6,10 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <stdexcept>
+#include <system_error>
+#include <vector>
 
 #include <fcntl.h>
 #include <sys/resource.h>
@@ -62,6 +65,25 @@ void RaiseDescriptorLimit() {
     if (::getrlimit(RLIMIT_NOFILE, &limit) == 0) {
         limit.rlim_cur = limit.rlim_max;
         ::setrlimit(RLIMIT_NOFILE, &limit);
+    }
+}
+
+void CloseFrom(int first) {
+    if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
+        return;
+    }
+    // Older kernels, and filters of system calls, refuse close_range; there may be a thousand million numbers to try
+    // then, so it looks which are open.
+    std::vector<int> open;
+    std::error_code error;
+    for (auto at = std::filesystem::directory_iterator("/proc/self/fd", error);
+         at != std::filesystem::directory_iterator(); at.increment(error)) {
+        open.push_back(std::atoi(at->path().filename().c_str()));
+    }
+    for (const int descriptor : open) {
+        if (descriptor >= first) {
+            ::close(descriptor);
+        }
     }
 }
 

@@ -32,6 +32,9 @@ bool IsAlive(const ProcessIdentity& process);
 // Lets the calling process open as many descriptors as the system ever grants it.
 void RaiseDescriptorLimit();
 
+// Closes every descriptor of the calling process from the first on.
+void CloseFrom(int first);
+
 // When memory runs out, the kernel ends this process before others that more depend on. Does nothing where /proc
 // cannot be written.
 void PreferAsOomVictim();

@@ -3,14 +3,10 @@
 
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <cstring>
 #include <exception>
-#include <filesystem>
 #include <string>
-#include <system_error>
 #include <utility>
-#include <vector>
 
 #include <fcntl.h>
 #include <sys/prctl.h>
@@ -27,25 +23,6 @@ namespace {
 
 constexpr int kWakeDescriptor = 3;
 constexpr int kKeptDescriptor = 4;
-
-// Closes every descriptor from the first on. Older kernels, and filters of system calls, refuse close_range; there may
-// be a thousand million numbers to try then, so it looks which are open.
-void CloseFrom(int first) {
-    if (::close_range(static_cast<unsigned int>(first), ~0U, 0) == 0) {
-        return;
-    }
-    std::vector<int> open;
-    std::error_code error;
-    for (auto at = std::filesystem::directory_iterator("/proc/self/fd", error);
-         at != std::filesystem::directory_iterator(); at.increment(error)) {
-        open.push_back(std::atoi(at->path().filename().c_str()));
-    }
-    for (const int descriptor : open) {
-        if (descriptor >= first) {
-            ::close(descriptor);
-        }
-    }
-}
 
 [[noreturn]] void RunAndExit(const std::function<void()>& work) {
     try {
@@ -94,7 +71,7 @@ int LeaveHost(pid_t host, control::SlotTable& slots, int standard_output, int ke
     if (moved >= 0) {
         ::dup2(moved, kKeptDescriptor);
     }
-    CloseFrom(moved < 0 ? kKeptDescriptor : kKeptDescriptor + 1);
+    base::CloseFrom(moved < 0 ? kKeptDescriptor : kKeptDescriptor + 1);
     for (const int number : {SIGPIPE, SIGINT, SIGQUIT, SIGHUP, SIGUSR1, SIGUSR2}) {
         std::signal(number, SIG_IGN);
     }

@@ -1,0 +1,34 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Makes a picture that a stranger gave anew: what was in its file beside the pixels is gone.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string_view>
+#include <vector>
+
+namespace lookhaven::media {
+
+// A picture of more is not decoded: one of four samples a pixel fits into libav's largest block.
+constexpr std::int64_t kMaxRedrawnPixels = 30'000'000;
+constexpr int kMaxRedrawnSidePixels = 16'384;
+
+struct Redrawn {
+    enum class Outcome : char {
+        kPng = 'p',
+        kJpeg = 'j',
+        kBroken = 'b',         // cannot be decoded
+        kTooManyPixels = 'm',  // more than the above; nothing was decoded
+        kTooLarge = 'l',       // the new file would be
+    } outcome = Outcome::kBroken;
+    std::vector<std::uint8_t> file;  // of kPng and kJpeg
+};
+
+// type: "png", "jpg" or "webp", as which the file is decoded. A JPEG becomes an upright JPEG, a WebP of lossy compression
+// without transparency a JPEG as well. Any other becomes a PNG, or where that exceeds max_bytes and nothing of it can be
+// transparent, a JPEG. Starts no thread; takes up to 15 bytes and 0.2 µs a pixel. Throws std::bad_alloc.
+Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes);
+
+}  // namespace lookhaven::media
