@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Emap: what an editor of e-maps needs, and the states of doors and ports.
+// VEXO.Emap: e-maps as a manager sets them up, what their editor needs, and the states of doors and ports.
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
 
+#include "standalone/api/emap_setup.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/emap/item_json.h"
@@ -174,7 +175,13 @@ constexpr Method kMethods[] = {{"States", States},
                                {"Items", Items, kReads, kManagers},
                                {"Devices", Devices, kReads, kManagers},
                                {"SaveItems", SaveItems, kChanges, kManagers},
-                               {"Report", Report, kChanges, kManagers}};
+                               {"Report", Report, kChanges, kManagers},
+                               {"List", ListEmaps, kChanges, kManagers},
+                               {"Add", AddEmap, kChanges, kManagers},
+                               {"Picture", SetEmapPicture, kChanges, kManagers},
+                               {"Rename", RenameEmap, kChanges, kManagers},
+                               {"Remove", RemoveEmap, kChanges, kManagers},
+                               {"MayUpload", MayUpload, kReads, kManagers}};
 
 }  // namespace
 

@@ -35,8 +35,9 @@ struct OwnApi {
 extern const OwnApi kAuthApi;      // log in, log out, who am I; the first account
 extern const OwnApi kCameraApi;    // cameras as a manager sets them up
 extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
-extern const OwnApi kEmapApi;      // what an editor of e-maps needs, and the states of doors and ports
+extern const OwnApi kEmapApi;      // e-maps, what their editor needs, and the states of doors and ports
 extern const OwnApi kEventApi;     // report what happened at a camera, list it, download its footage
+extern const OwnApi kGroupApi;     // camera groups as a manager sets them up
 extern const OwnApi kMountApi;     // storage mounts: how full, for how long, and their limits
 extern const OwnApi kPairingApi;   // the cameras of this host, for a paired host
 extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends

@@ -14,10 +14,12 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/api/decoder_sandbox.h"
+#include "standalone/api/emap_setup.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
+#include "standalone/emap/map_picture.h"
 #include "standalone/http/body.h"
 #include "standalone/store/engine.h"
 #include "standalone/store/servers.h"
@@ -30,6 +32,8 @@ namespace {
 constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
 constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
 constexpr std::size_t kMaxBodyWithoutSession = 4096;
+constexpr std::size_t kMaxBody = std::size_t{1} << 20;
+constexpr const char* kManagersOnly = "only a manager may do this";
 constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
 
 // Under a sanitizer a process maps terabytes before main.
@@ -71,12 +75,22 @@ Call ReadCall(const Service& service, http::Request& request, control::SlotTable
               .slot = slot,
               .counters = service.counters};
     call.login = FindLogin(call);
-    if (!call.login && request.body.size() + request.unread_body_bytes > kMaxBodyWithoutSession) {
+    const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
+    if (!call.login && body_bytes > kMaxBodyWithoutSession) {
         throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401,
                       "log in first: without a session a body holds 4 KiB at most");
     }
+    const bool is_picture = IsPictureUpload(call);
+    if (is_picture && call.login && !call.login->is_manager) {
+        throw Failure(403, kManagersOnly);
+    }
+    if (body_bytes > (is_picture ? emap::kMaxUploadBytes : kMaxBody)) {
+        throw Failure(413, is_picture ? "the picture is larger than 20 MiB" : "the request body is larger than 1 MiB");
+    }
     http::ReadBody(request, STDOUT_FILENO);
-    AddBody(request, call.parameters);
+    if (!is_picture) {
+        AddBody(request, call.parameters);
+    }
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
     call.method = call.Parameter("method").asString();
@@ -129,7 +143,7 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
         throw Failure(405, "this method takes POST only");
     }
     if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {
-        throw Failure(403, "only a manager may do this");
+        throw Failure(403, kManagersOnly);
     }
     try {
         return method.serve(call);

@@ -5,6 +5,7 @@
 #include <iostream>
 #include <optional>
 
+#include "standalone/admin/emaps.h"
 #include "standalone/base/file.h"
 #include "standalone/base/text.h"
 #include "standalone/cli/command_group.h"
@@ -56,43 +57,32 @@ std::string ReadBounded(const std::string& file, std::size_t max_bytes) {
     return bytes;
 }
 
-// Adds the map and lets fill add picture and items; what fill throws removes the map again.
-template <typename Fill>
-Emap AddFilled(store::Store& store, const Emap& emap, Fill&& fill) {
-    const int id = Emaps(store).Add(emap);
-    try {
-        fill(id);
-    } catch (...) {
-        Emaps(store).Remove(id);
-        throw;
+// Before the store is opened, since it forks.
+emap::MapPicture ReadPicture(const std::string& file) {
+    return emap::MapPicture::OfOperator(ReadBounded(file, emap::kMaxUploadBytes));
+}
+
+admin::EmapChange ChangeOf(const Request& request) {
+    admin::EmapChange change{
+        .name = request.name, .hide_names = request.hide_names, .small_items = request.small_items};
+    if (!request.file.empty()) {
+        change.picture = ReadPicture(request.file);
     }
-    return *Emaps(store).Find(id);
+    return change;
 }
 
 void Add(const Console& console, const Request& request) {
-    const std::string picture = ReadBounded(request.file, emap::kMaxPictureBytes);
+    const admin::EmapChange change = ChangeOf(request);
     store::Store store = console.OpenStore();
-    Emap wanted{.name = request.name.value_or("")};
-    wanted.hide_names = request.hide_names.value_or(false);
-    wanted.small_items = request.small_items.value_or(false);
-    const Emap emap = AddFilled(store, wanted,
-                                [&](int id) { emap::Pictures(store, console.Installation().Home()).Put(id, picture); });
+    const Emap emap = admin::AddEmap(store, {}, console.Installation().Home(), change);
     console.Answer(ToData(emap), "Added e-map ", emap.name, " with id ", emap.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
-    const std::optional<std::string> picture =
-        request.file.empty() ? std::nullopt : std::optional(ReadBounded(request.file, emap::kMaxPictureBytes));
+    const admin::EmapChange change = ChangeOf(request);
     store::Store store = console.OpenStore();
-    Emap emap = RequireEmap(store, request.id);
-    emap.name = request.name.value_or(emap.name);
-    emap.hide_names = request.hide_names.value_or(emap.hide_names);
-    emap.small_items = request.small_items.value_or(emap.small_items);
-    if (picture) {
-        emap::Pictures(store, console.Installation().Home()).Put(emap.id, *picture);
-    }
-    Emaps(store).Update(emap);
-    console.Answer(ToData(RequireEmap(store, emap.id)), "Changed e-map ", emap.id, ".");
+    const Emap emap = admin::SetEmap(store, {}, console.Installation().Home(), request.id, {}, change);
+    console.Answer(ToData(emap), "Changed e-map ", emap.id, ".");
 }
 
 void List(const Console& console) {
@@ -115,8 +105,7 @@ void Show(const Console& console, const Request& request) {
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Emaps(store).Remove(request.id);
-    emap::Pictures(store, console.Installation().Home()).Sweep();
+    admin::RemoveEmap(store, {}, console.Installation().Home(), request.id, {});
     console.Answer(Object("id", request.id), "Removed e-map ", request.id, ".");
 }
 
@@ -146,18 +135,22 @@ void Import(const Console& console, const Request& request) {
     if (!picture) {
         throw Failure(kDataError, "the picture in ", request.file, " is damaged");
     }
+    const admin::EmapChange change{.name = request.name.value_or(file["name"].asString()),
+                                   .hide_names = file["hideItemName"].asBool(),
+                                   .small_items = file["smallItemSize"].asBool(),
+                                   .picture = emap::MapPicture::OfOperator(*picture)};
     std::vector<EmapItem> items = emap::ItemsFromJson(file["items"]);
     store::Store store = console.OpenStore();
     const std::size_t all = items.size();
     std::erase_if(items, [&](const EmapItem& item) { return !Emaps(store).Knows(item); });
-    Emap wanted{.name = request.name.value_or(file["name"].asString())};
-    const Emap emap = AddFilled(store, wanted, [&](int id) {
-        emap::Pictures(store, console.Installation().Home()).Put(id, *picture);
-        Emap filled = RequireEmap(store, id);
-        filled.hide_names = file["hideItemName"].asBool();
-        filled.small_items = file["smallItemSize"].asBool();
-        Emaps(store).ReplaceItems(filled, items);
-    });
+    const std::filesystem::path home = console.Installation().Home();
+    Emap emap = admin::AddEmap(store, {}, home, change);
+    try {
+        emap.revision = Emaps(store).ReplaceItems(emap, items);
+    } catch (...) {
+        admin::RemoveEmap(store, {}, home, emap.id, {});
+        throw;
+    }
     const std::size_t left_out = all - items.size();
     Json::Value data = ToData(emap);
     data["items_left_out"] = Json::UInt64(left_out);
@@ -176,7 +169,7 @@ void AddEmap(CLI::App& program, const Console& console) {
         command.Switch("--hide-names,!--show-names", request.hide_names, "Whether names are shown beside the items")
             .Switch("--small-items,!--large-items", request.small_items, "The size in which items are drawn");
     };
-    Command add = group.Add("add", "Adds an e-map with its picture: PNG, JPEG, WebP or SVG, at most 16 MiB", Add)
+    Command add = group.Add("add", "Adds an e-map with its picture: PNG, JPEG, WebP or SVG, at most 20 MiB", Add)
                       .Option("name", request.name, name, Required)
                       .Option("picture", request.file, "The picture's file; - for standard input", Required);
     add_flags(add);

@@ -4,6 +4,7 @@
 #include <functional>
 #include <optional>
 
+#include "standalone/admin/groups.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
@@ -31,20 +32,20 @@ constexpr Column kColumns[] = {{"id", "id"}, {"name", "name"}, {"cameras", "came
 
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    CameraGroup group{0, request.name.value_or(""), {request.add.begin(), request.add.end()}};
-    group.id = Groups(store).Add(group);
+    const CameraGroup group =
+        admin::AddGroup(store, {}, {0, request.name.value_or(""), {request.add.begin(), request.add.end()}});
     console.Answer(ToData(group), "Added group ", group.name, " with id ", group.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    CameraGroup group = Require(Groups(store).Find(request.id), "there is no camera group ", request.id);
-    group.name = request.name.value_or(group.name);
-    group.camera_ids.insert(request.add.begin(), request.add.end());
-    for (const int camera : request.drop) {
-        group.camera_ids.erase(camera);
-    }
-    Groups(store).Update(group);
+    const CameraGroup group = admin::SetGroup(store, {}, request.id, {}, [&request](CameraGroup& edited) {
+        edited.name = request.name.value_or(edited.name);
+        edited.camera_ids.insert(request.add.begin(), request.add.end());
+        for (const int camera : request.drop) {
+            edited.camera_ids.erase(camera);
+        }
+    });
     const Json::Value data = ToData(group);
     console.Answer(data, "Group ", group.name, " has the cameras ", PlainText(data["cameras"]), ".");
 }
@@ -57,7 +58,7 @@ void List(const Console& console) {
 
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    Groups(store).Remove(request.id);
+    admin::RemoveGroup(store, {}, request.id, {});
     console.Answer(Object("id", request.id), "Removed group ", request.id, "; its cameras are kept.");
 }
 

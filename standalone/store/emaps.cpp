@@ -179,6 +179,17 @@ std::vector<EmapItem> Emaps::Items(int id) {
     return connection_.Read([&](soci::session& sql) { return FetchItems(sql, id); });
 }
 
+std::map<int, std::set<int>> Emaps::Links() {
+    return connection_.Read([](soci::session& sql) {
+        std::map<int, std::set<int>> links;
+        const EmapItemType kind = EmapItemType::kEmap;
+        Query<std::tuple<int, int>>(
+            sql, kOnce, "select device_id, emap_id from emap_items where type = :type and server_id = 0", kind)
+            .ForEach([&links](const auto& row) { links[std::get<0>(row)].insert(std::get<1>(row)); });
+        return links;
+    });
+}
+
 bool Emaps::Knows(const EmapItem& item) {
     return connection_.Read([&](soci::session& sql) { return HasDevice(sql, item); });
 }

@@ -3,7 +3,9 @@
 // E-maps: floor plans and what is placed on them. Their pictures' files stand in emap/pictures.h.
 #pragma once
 
+#include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -65,6 +67,8 @@ class Emaps {
 
     // In the order they were given.
     std::vector<EmapItem> Items(int id);
+    // Which maps have a link to each map, by id; maps without one are missing.
+    std::map<int, std::set<int>> Links();
     // Whether the item's device is known.
     bool Knows(const EmapItem& item);
     // Replaces all items and both flags of emap.id at once, and returns the new revision. Throws NotFound for an

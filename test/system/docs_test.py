@@ -1,6 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # Runs the examples of docs/api/: each answer must have the status, the keys and the types that its page shows.
+import base64
 import contextlib
 import json
 import re
@@ -10,6 +11,10 @@ import unittest
 from installation import PASSWORDS, ROOT, Installation, call, recorded_events
 from parts import Parts
 
+# For a file that an example names: one pixel.
+PNG = base64.b64decode(
+    "iVBORw0KGgoAAAANSUhEUgAAAAEAAAABCAYAAAAfFcSJAAAADUlEQVR42mNk+M9QDwADhgGAWjR9awAAAABJRU5ErkJggg=="
+)
 EXAMPLE = re.compile(
     r"(?:```player\n([^`]*)```\s*)?```request(?: as (\w+))?\n([^`]*)```\s*```answer (\d+)(?: (\S+))?\n([^`]*)```"
 )
@@ -56,7 +61,8 @@ class DocsTest(unittest.TestCase):
                     log_in = server.login if page.name == "auth.md" else server.session
                     headers = {"Cookie": f"id={log_in(account)}"} if account else {}
                     form = "json" if body.startswith("{") else "x-www-form-urlencoded"
-                    headers["Content-Type"] = f"application/{form}"
+                    headers["Content-Type"] = "image/png" if body.startswith("@") else f"application/{form}"
+                    body = PNG if body.startswith("@") else body
                     with self.subTest(page=page.name, request=line), contextlib.ExitStack() as running:
                         ran += 1
                         if player:

@@ -6,6 +6,7 @@ import os
 import unittest
 
 from api_test import call, play
+from docs_test import PNG
 from installation import Installation
 from visit import Visit
 
@@ -89,16 +90,39 @@ class EmapTest(unittest.TestCase):
         self.assertEqual(states["door"][0]["state"] + states["io"][0]["state"], "openon")
 
     def test_a_picture_that_is_broken_or_gone_leaves_the_items(self):
-        broken = self.server.home / "broken"
-        broken.write_bytes(b"\x89PNG\r\n\x1a\nand nothing more")
-        made = self.command("emap", "add", "Broken", str(broken))
+        whole = self.server.home / "whole"
+        whole.write_bytes(PNG)
+        made = self.command("emap", "add", "Broken", str(whole))
         self.command("emap", "item", "add", str(made["id"]), "camera", "1")
         self.assertEqual(self.shown(made["id"])["emapType"], "png")
         picture = self.server.home / "emaps" / made["image"]
+        picture.write_bytes(b"\x89PNG\r\n\x1a\nand nothing more")
+        self.assertEqual((self.shown(made["id"])["emapType"], self.shown(made["id"])["itemNum"]), ("png", 1))
         picture.unlink()
         os.mkfifo(picture)  # would hang whoever opens it to read
         data = self.shown(made["id"])
         self.assertEqual((data["emap"], data["emapLength"], data["itemNum"]), ("", "0", 1))
+
+    def test_a_large_body_is_a_managers_picture_alone(self):
+        large = PNG + bytes(5 << 20)
+        for what, status, picture, account, more in [
+            ("a picture", 200, PNG, "admin", {"name": "Small"}),
+            ("bytes behind it", 200, large, "admin", {"name": "Large"}),
+            ("a viewer's", 403, large, "viewer", {"name": "x"}),
+            ("nobody's", 401, large, None, {"name": "x"}),
+            ("more than 20 MiB", 413, PNG + bytes(20 << 20), "admin", {"name": "x"}),
+            ("of a method that takes none", 413, large, "admin", {"method": "Remove"}),
+            ("of an api that takes none", 413, large, "admin", {"method": "Add", "API": "VEXO.Camera"}),
+            ("a method named twice", 413, large, "admin", {"method": "Add&method=Remove", "name": "x"}),
+            ("an escaped name of the api", 413, large, "admin", {"API": "VEXO%2eEmap", "name": "x"}),
+        ]:
+            with self.subTest(what):
+                api, method = more.pop("API", "VEXO.Emap"), more.pop("method", "Add")
+                query = "&".join([f"api={api}&version=1&method={method}", *(f"{name}={text}" for name, text in more.items())])
+                answer = self.server.request(query, account, body=picture, headers={"Content-Type": "image/png"})
+                self.assertEqual(answer.status, status, answer.body)
+                self.assertEqual(answer.headers.get_content_type(), "application/json")
+        self.assertEqual(list((self.server.home / "run/nginx-body").rglob("*[0-9]")), [], "no body is left")
 
     def test_a_visit(self):
         harm = self.server.home / "harm.svg"

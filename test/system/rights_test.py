@@ -40,6 +40,16 @@ Emap.Items emap={map}                                                 E      E  
 Emap.Devices                                                          E      E     F       F     F    F       F        F      D       E
 POST Emap.SaveItems emap={map} revision=99 items=[]                   E      E     F       F     F    F       F        F      C/N     E
 POST Emap.Report kind=door id={door} state=open                       E      E     F       F     F    F       F        F      D/N     E
+Emap.MayUpload                                                        E      E     F       F     F    F       F        F      D       E
+POST Emap.List                                                        E      E     F       F     F    F       F        F      D       E
+POST Emap.Add name=x                                                  E      E     F       F     F    F       F        F      B       E
+POST Emap.Picture emap={map} revision=99                              E      E     F       F     F    F       F        F      C/N     E
+POST Emap.Rename emap={map} revision=99 name=x                        E      E     F       F     F    F       F        F      C/N     E
+POST Emap.Remove emap={map} revision=99                               E      E     F       F     F    F       F        F      C/N     E
+POST Group.List                                                       E      E     F       F     F    F       F        F      D       E
+POST Group.Add name=                                                  E      E     F       F     F    F       F        F      B       E
+POST Group.Set id={group} revision=1 name=x                           E      E     F       F     F    F       F        F      C/N     E
+POST Group.Remove id={group} revision=1                               E      E     F       F     F    F       F        F      C/N     E
 POST Event.Mark kind=alert camera={camera}                            E      E     F       N     F    F       F        D/N    D/N     E
 Event.List cameralists={camera}: event                                E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
@@ -147,7 +157,7 @@ class RightsTest(unittest.TestCase):
         server.session("ended")
         server.cli("user", "passwd", "ended", text="another secret")
         marks = server.request(call("VEXO.Event", "List", cameralists=2, kind="alert"), "manager").json["data"]["event"]
-        cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "mount": 1, "event": recorded_events(server, 2)[0]["id"],
+        cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "group": 1, "mount": 1, "event": recorded_events(server, 2)[0]["id"],
                    "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"],
                    "user": next(one["id"] for one in json.loads(server.cli("user", "list", "--json")) if one["name"] == "ended")}
 

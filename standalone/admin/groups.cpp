@@ -1,0 +1,94 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/groups.h"
+
+#include <algorithm>
+
+#include "standalone/admin/change.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+using store::CameraGroup;
+using store::Groups;
+
+CameraGroup RequireGroup(Groups& groups, int id) {
+    std::optional<CameraGroup> group = groups.Find(id);
+    if (!group) {
+        throw store::NotFound("there is no camera group " + std::to_string(id));
+    }
+    return *std::move(group);
+}
+
+Json::Value Audited(const CameraGroup& group) {
+    Json::Value record = GroupRecord(group);
+    record.removeMember("revision");
+    return record;
+}
+
+}  // namespace
+
+Json::Value GroupRecord(const CameraGroup& group) {
+    Json::Value json;
+    json["id"] = group.id;
+    json["name"] = group.name;
+    json["camera"] = Json::arrayValue;
+    for (const int camera : group.camera_ids) {
+        json["camera"].append(camera);
+    }
+    json["revision"] = Json::Int64{RevisionOf(json)};
+    return json;
+}
+
+CameraGroup AddGroup(store::Store& store, const Actor& actor, const CameraGroup& group) {
+    CameraGroup added = group;
+    Apply(store, actor, [&] {
+        added.id = Groups(store).Add(group);
+        return Change{"group.add", Named(added.name, added.id), {}, Audited(added)};
+    });
+    return added;
+}
+
+CameraGroup SetGroup(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,
+                     const std::function<void(CameraGroup&)>& edit) {
+    CameraGroup group;
+    Apply(store, actor, [&] {
+        Groups groups(store);
+        const CameraGroup before = RequireGroup(groups, id);
+        RequireCurrent(GroupRecord(before), seen);
+        group = before;
+        edit(group);
+        groups.Update(group);
+        return Change{"group.set", Named(group.name, id), Audited(before), Audited(group)};
+    });
+    return group;
+}
+
+void RemoveGroup(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen) {
+    Apply(store, actor, [&] {
+        Groups groups(store);
+        const CameraGroup group = RequireGroup(groups, id);
+        RequireCurrent(GroupRecord(group), seen);
+        Json::Value before = Audited(group);
+        for (const std::string& account : DeniedTo(store, id)) {
+            before["deniedTo"].append(account);
+        }
+        groups.Remove(id);
+        return Change{"group.remove", Named(group.name, id), before, {}};
+    });
+}
+
+std::vector<std::string> DeniedTo(store::Store& store, int group) {
+    store::Users users(store);
+    std::vector<std::string> names;
+    for (const store::User& user : users.List()) {
+        const store::Denials denials = users.FindDenials(user.id);
+        if (std::ranges::any_of(denials.groups, [group](const auto& kind) { return kind.second.contains(group); })) {
+            names.push_back(user.name);
+        }
+    }
+    return names;
+}
+
+}  // namespace lookhaven::admin

@@ -1,0 +1,99 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// VEXO.Group: camera groups as a manager sets them up.
+#include "standalone/api/own_apis.h"
+
+#include "standalone/admin/change.h"
+#include "standalone/admin/groups.h"
+#include "standalone/api/camera_fields.h"
+#include "standalone/api/revision.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+Json::Value WithUse(store::Store& records, Json::Value record) {
+    record["deniedTo"] = Json::arrayValue;
+    for (const std::string& account : admin::DeniedTo(records, record["id"].asInt())) {
+        record["deniedTo"].append(account);
+    }
+    return record;
+}
+
+auto Completer(const Call& call) {
+    return [&call](const Json::Value& record) { return WithUse(call.Records(), record); };
+}
+
+std::string AnswerRecord(const Call& call, const store::CameraGroup& group) {
+    Json::Value data;
+    data["group"] = WithUse(call.Records(), admin::GroupRecord(group));
+    return SuccessAnswer(data);
+}
+
+int IdOf(const Call& call) {
+    const Json::Value& id = call.Parameter("id");
+    if (!id.isInt64()) {
+        throw Failure(400, "id must be a number");
+    }
+    return id.isInt() ? id.asInt() : 0;
+}
+
+// What the call does not name stays.
+void TakeGroupFields(const Call& call, store::CameraGroup& group) {
+    TakeField(call, "name", group.name);
+    const Json::Value& cameras = call.Parameter("camera");
+    if (cameras.isNull()) {
+        return;
+    }
+    if (!cameras.isArray()) {
+        throw Failure(400, "camera must be a list");
+    }
+    group.camera_ids.clear();
+    for (const Json::Value& camera : cameras) {
+        group.camera_ids.insert(camera.asInt());
+    }
+}
+
+std::string List(const Call& call) {
+    Json::Value data;
+    data["group"] = Json::arrayValue;
+    for (const store::CameraGroup& group : store::Groups(call.Records()).List()) {
+        data["group"].append(WithUse(call.Records(), admin::GroupRecord(group)));
+    }
+    return SuccessAnswer(data);
+}
+
+std::string Add(const Call& call) {
+    store::CameraGroup group;
+    TakeGroupFields(call, group);
+    return AnswerRecord(call, admin::AddGroup(call.Records(), call.Actor(), group));
+}
+
+std::string Set(const Call& call) {
+    const std::int64_t seen = SeenRevision(call);
+    return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
+                            return admin::SetGroup(
+                                call.Records(), call.Actor(), IdOf(call), seen,
+                                [&call](store::CameraGroup& group) { TakeGroupFields(call, group); });
+                        }));
+}
+
+std::string Remove(const Call& call) {
+    const std::int64_t seen = SeenRevision(call);
+    OnCurrentRecord(Completer(call), [&] { admin::RemoveGroup(call.Records(), call.Actor(), IdOf(call), seen); });
+    return SuccessAnswer(Json::objectValue);
+}
+
+using enum Method::Effect;
+using enum Method::Audience;
+
+constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},
+                               {"Add", Add, kChanges, kManagers},
+                               {"Set", Set, kChanges, kManagers},
+                               {"Remove", Remove, kChanges, kManagers}};
+
+}  // namespace
+
+const OwnApi kGroupApi{"VEXO.Group", kMethods};
+
+}  // namespace lookhaven::api
