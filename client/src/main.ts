@@ -3,8 +3,8 @@
 // Starts the web client. Where things are:
 //
 //   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
-//              people, mounts, audit), the parts of an endless answer (multipart), requests that end in time (deadline) and
-//              take turns (semaphore)
+//              groups, emap_setup, people, mounts, audit), the parts of an endless answer (multipart), files that are sent
+//              (upload), requests that end in time (deadline) and take turns (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
@@ -18,9 +18,9 @@
 //     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     settings/   the sections of the settings: cameras, accounts, storage, audit. Each has a list and a page of one record
-//                 (record_page), whose form (record_form) notices what others have changed meanwhile (merge,
-//                 conflict_panel)
+//     settings/   the sections of the settings: cameras and their groups, maps, accounts, storage, audit. Most have a list
+//                 and a page of one record (record_page), whose form (record_form) notices what others have changed
+//                 meanwhile (merge, conflict_panel)
 //     widgets/    what all of these use: elements, buttons, icons, fields, dialogs, texts, titles, notices, keys, panning and
 //                 zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
@@ -52,6 +52,7 @@ import "./style/account.css";
 import "./style/settings.css";
 import "./style/cameras.css";
 import "./style/people.css";
+import "./style/emaps.css";
 import "./style/storage.css";
 import "./style/audit.css";
 import { App } from "./ui/app";

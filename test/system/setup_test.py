@@ -70,6 +70,13 @@ class SetupTest(unittest.TestCase):
             plan = camera["plan"]
             self.assertEqual((camera["name"], camera["source"][0]["address"]), ("Loading bay", source))
             self.assertEqual((plan["mode"], plan["pre"], plan["hours"]), ("schedule", 7, "0" * 120 + "2" * 48))
+            self.assertIn("Loading bay", visit.see("group")["row"])
+            maps = visit.see("maps")
+            self.assertIn("PNG, JPEG or WebP", maps["refused"])
+            self.assertEqual(maps["size"], [2400, 1200], "a drawing is large enough to look at")
+            self.assertEqual(maps["narrow"], 390)
+            self.assertIn("Ground floor", maps["removal"], "what else shows the map")
+            self.assertRegex(maps["hash"], r"^#map=\d+$")
             account = visit.see("account")
             self.assertIn("sees 1 of", account["row"])
             self.assertIn("without sound", account["row"])
@@ -78,7 +85,8 @@ class SetupTest(unittest.TestCase):
             self.assertEqual([one["name"] for one in listed.json["data"]["camera"]], ["Loading bay"])
             self.assertEqual(self.kinds(server, camera["id"], session), {"image"})
             self.assertEqual(self.kinds(server, camera["id"], server.session("admin")), {"image", "audio"})
-            wanted = ["Account added: night (", "Camera added: Loading bay ("]
+            wanted = ["Account added: night (", "Map changed: Dock (", "Map added: Loading dock (",
+                      "Camera changed: Loading bay (", "Camera group added: Deliveries (", "Camera added: Loading bay ("]
             entries = visit.see("audit")["entries"]
             self.assertEqual([entry[: len(text)] for entry, text in zip(entries, wanted)], wanted)
             self.assertNotIn(account["word"], json.dumps(server.request(

@@ -4,6 +4,7 @@
 
 import { Deadline } from "./deadline";
 import { SignalLosses } from "./signal_losses";
+import { postFile, type UploadOptions } from "./upload";
 
 export interface Account {
   account: string;
@@ -48,6 +49,8 @@ export interface Snapshot {
 export const kVideoTypeMjpeg = 1;
 
 const kAnswerTimeoutMs = 20_000;
+/** Once the last byte of a file has gone, the server may work on it. */
+const kUploadTimeoutMs = 40_000;
 const kTooManyAttempts = "Too many attempts. Please wait a minute.";
 
 /** A request that failed; `message` is for the user. */
@@ -215,16 +218,43 @@ export class Server {
           ? { method: "POST", body: JSON.stringify(how.json), headers: { "Content-Type": "application/json" } }
           : {}),
       });
-      if (answer.status === 401 && !how.quiet) this.#onSessionEnd();
-      if (!answer.ok) throw await failureOf(answer);
-      const envelope = (await answer.clone().json()) as { success?: boolean; data?: Data };
-      if (envelope.success !== true) throw await failureOf(answer);
-      return envelope.data as Data;
+      return await this.#dataOf<Data>(answer, how.quiet ?? false);
     } catch (error) {
       throw asServerError(error);
     } finally {
       deadline.release();
     }
+  }
+
+  /** The data of an answer to a POST whose body is the file. */
+  async upload<Data>(
+    api: string,
+    method: string,
+    parameters: Record<string, string>,
+    file: Blob,
+    { signal, onProgress }: UploadOptions,
+  ): Promise<Data> {
+    const deadline = new Deadline(kUploadTimeoutMs, signal);
+    const noteProgress = (fraction: number) => {
+      deadline.extend();
+      onProgress(fraction);
+    };
+    try {
+      const options = { signal: deadline.signal, onProgress: noteProgress };
+      return await this.#dataOf<Data>(await postFile(address(api, method, parameters), file, options), false);
+    } catch (error) {
+      throw asServerError(error);
+    } finally {
+      deadline.release();
+    }
+  }
+
+  async #dataOf<Data>(answer: Response, isQuiet: boolean): Promise<Data> {
+    if (answer.status === 401 && !isQuiet) this.#onSessionEnd();
+    if (!answer.ok) throw await failureOf(answer);
+    const envelope = (await answer.clone().json()) as { success?: boolean; data?: Data };
+    if (envelope.success !== true) throw await failureOf(answer);
+    return envelope.data as Data;
   }
 }
 

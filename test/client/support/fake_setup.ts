@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Cameras, accounts and mounts that are set up, with revisions, and the password "right" of the manager.
+// Cameras, groups, e-maps, accounts and mounts that are set up, with revisions, and the password "right" of the manager.
 
 import type { CameraRecord } from "../../../client/src/wire/camera_setup";
+import type { EmapRecord } from "../../../client/src/wire/emap_setup";
+import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { UserRecord } from "../../../client/src/wire/people";
 
@@ -21,6 +23,8 @@ export class FakeSetup {
   readonly camera: CameraRecord[] = [];
   readonly user: UserRecord[] = [];
   readonly mount: MountRecord[] = [];
+  readonly group: GroupRecord[] = [];
+  readonly emap: EmapRecord[] = [];
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
   /** The answer of a probe. */
@@ -29,7 +33,7 @@ export class FakeSetup {
   loss: unknown = null;
 
   readonly methods: Record<string, SetupMethod> = {
-    "VEXO.Camera.List": () => ok({ camera: this.camera, group: [], mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
+    "VEXO.Camera.List": () => ok({ camera: this.camera, group: this.group, mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
     "VEXO.Camera.Probe": () => ok(this.probe),
     "VEXO.Camera.Add": (request) => this.#note("Camera.Add", request, ok({ camera: { revision: 1, ...request } })),
     "VEXO.Camera.Set": (request) => this.#set("camera", request),
@@ -39,10 +43,15 @@ export class FakeSetup {
     "VEXO.User.Sessions": () => ok({ session: [] }),
     "VEXO.Mount.List": () => ok({ mount: this.mount }),
     "VEXO.Mount.Set": (request) => (request.confirm ? this.#set("mount", request) : ok({ confirm: this.loss })),
+    "VEXO.Group.List": () => ok({ group: this.group }),
+    "VEXO.Group.Add": (request) => this.#note("Group.Add", request, ok({ group: { ...request, id: 7, revision: 1, deniedTo: [] } })),
+    "VEXO.Group.Set": (request) => this.#set("group", request),
+    "VEXO.Emap.List": () => ok({ emap: this.emap }),
+    "VEXO.Emap.Rename": ({ emap, ...rest }) => this.#set("emap", { ...rest, id: Number(emap) } as Request),
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
   };
 
-  #set(kind: "camera" | "user" | "mount", request: Request): Answer {
+  #set(kind: "camera" | "user" | "mount" | "group" | "emap", request: Request): Answer {
     const { id, revision, ...changes } = request;
     const record = this[kind].find((one) => one.id === id)!;
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);

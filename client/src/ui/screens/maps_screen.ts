@@ -162,7 +162,9 @@ export class MapsScreen extends Screen {
     this.#showStates();
     if (!(await this.#view.showPicture(content.picture))) this.#showMessage("The map's picture cannot be shown.");
     void this.#loadStates();
-    if (this.#kept.mapDraft?.id === id) void this.#openEditor();
+    const isEdited = openMap()?.isEdited ?? false;
+    if (isEdited) replaceRoute(id);
+    if (this.#kept.mapDraft?.id === id || (isEdited && !this.#edit.hidden)) void this.#openEditor();
   }
 
   /** In place of a map. */

@@ -2,9 +2,9 @@
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
 // there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps,
-// and there #map=2, and of that map a camera, #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings,
-// and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there
-// is an account, #setup= and a one-time token.
+// and there #map=2, its editor, #map=2&edit, and of that map a camera, #map=2&camera=5 or, of the recording server 3,
+// #map=2&camera=5@3; #settings, and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or
+// a new one, &open=new. Before there is an account, #setup= and a one-time token.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
@@ -13,14 +13,14 @@ import type { FootageRef } from "../../wire/footage";
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
-export const kSettingsSections = ["cameras", "accounts", "storage", "audit"] as const;
+export const kSettingsSections = ["cameras", "groups", "maps", "accounts", "storage", "audit"] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;
 /** Browsers refuse to change the address more often than a few times a second. */
 const kRecordIntervalMs = 500;
 const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
-const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?)?$/;
+const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?|(&edit))?$/;
 
 const kSetupPattern = /^#setup=([0-9a-f]+)$/;
 
@@ -139,12 +139,19 @@ export interface OpenMap {
   map: number;
   /** What is seen large over the map. */
   camera: Pick<Camera, "id" | "server"> | null;
+  /** Its editor is to be opened. */
+  isEdited: boolean;
 }
 
 export function openMap(): OpenMap | null {
   const found = kMapPattern.exec(location.hash);
   if (!found) return null;
-  return { map: Number(found[1]), camera: found[2] ? { id: Number(found[2]), server: Number(found[3] ?? 0) } : null };
+  const camera = found[2] ? { id: Number(found[2]), server: Number(found[3] ?? 0) } : null;
+  return { map: Number(found[1]), camera, isEdited: found[4] !== undefined };
+}
+
+export function editedMapAddress(map: number): string {
+  return `#map=${map}&edit`;
 }
 
 /** Opens a map, or a camera over it. Each is an entry in the history, so that Back leads along the way that one came. */

@@ -8,6 +8,9 @@ import { CamerasPage } from "../settings/cameras/cameras_page";
 import { noRightState, type Page, type PageContext } from "../settings/page";
 import { AccountsPage } from "../settings/accounts/accounts_page";
 import { AccountPage } from "../settings/accounts/account_page";
+import { GroupPage } from "../settings/groups/group_page";
+import { GroupsPage } from "../settings/groups/groups_page";
+import { MapsPage } from "../settings/maps/maps_page";
 import { MountPage } from "../settings/storage/mount_page";
 import { StoragePage } from "../settings/storage/storage_page";
 import { element } from "../widgets/dom";
@@ -19,8 +22,10 @@ import { Screen } from "./screen";
 import type { Kept, Session } from "./session";
 import { SetupSteps } from "./setup_steps";
 
-const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {
+/** Groups are reached from the cameras. */
+const kSections: Record<Exclude<SettingsSection, "groups">, [label: string, icon: IconName]> = {
   cameras: ["Cameras", "camera"],
+  maps: ["Maps", "map"],
   accounts: ["Accounts", "people"],
   storage: ["Storage", "storage"],
   audit: ["Audit log", "audit"],
@@ -28,6 +33,8 @@ const kSections: Record<SettingsSection, [label: string, icon: IconName]> = {
 
 const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
   cameras: CamerasPage,
+  groups: GroupsPage,
+  maps: MapsPage,
   accounts: AccountsPage,
   storage: StoragePage,
   audit: AuditPage,
@@ -35,6 +42,7 @@ const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
 
 const kRecords: Partial<Record<SettingsSection, new (context: PageContext, id: number | "new") => Page>> = {
   cameras: CameraPage,
+  groups: GroupPage,
   accounts: AccountPage,
   storage: MountPage,
 };
@@ -62,7 +70,7 @@ export class SettingsScreen extends Screen {
       this.front.append(element("div", { class: "settings-body" }, this.#place));
       return;
     }
-    for (const [section, [label, name]] of Object.entries(kSections) as [SettingsSection, [string, IconName]][]) {
+    for (const [section, [label, name]] of Object.entries(kSections) as [keyof typeof kSections, [string, IconName]][]) {
       const href = settingsAddress(section);
       this.#links.push(element("a", { class: "settings-link", href }, icon(name), element("span", {}, label)));
     }
@@ -128,9 +136,10 @@ export class SettingsScreen extends Screen {
     this.#page = record ? new record(context, route.open!) : new kLists[route.section](context);
     this.#place.replaceChildren(this.#page.root);
     this.#place.scrollTop = 0;
-    titleScreen(kSections[route.section][0]);
+    const section = route.section === "groups" ? "cameras" : route.section;
+    titleScreen(kSections[section][0]);
     this.#links.forEach((link) => {
-      if (link.getAttribute("href") === settingsAddress(route.section)) link.setAttribute("aria-current", "page");
+      if (link.getAttribute("href") === settingsAddress(section)) link.setAttribute("aria-current", "page");
       else link.removeAttribute("aria-current");
     });
   }

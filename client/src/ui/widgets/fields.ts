@@ -121,19 +121,52 @@ export function radioField<Value extends string>(
   };
 }
 
+export interface ChipsField extends Field<number[]> {
+  /** Offers one more, ticked. */
+  add(choice: Named): void;
+}
+
 /** Any of a few; the value has the ids of those that are ticked, in rising order. */
-export function chipsField(label: string, choices: readonly Named[]): Field<number[]> {
-  const boxes = choices.map(({ id }) => element("input", { type: "checkbox", value: String(id) }));
-  const labels = boxes.map((box, at) => element("label", { class: "chip" }, box, element("span", {}, choices[at]!.name)));
-  const chips = element("div", { class: "chips" }, ...labels);
+export function chipsField(label: string, choices: readonly Named[]): ChipsField {
+  const boxes: HTMLInputElement[] = [];
+  const chips = element("div", { class: "chips" });
+  const offer = ({ id, name }: Named): HTMLInputElement => {
+    const box = element("input", { type: "checkbox", value: String(id) });
+    boxes.push(box);
+    chips.append(element("label", { class: "chip" }, box, element("span", {}, name)));
+    return box;
+  };
+  choices.forEach(offer);
   return {
     root: element("fieldset", { class: "form-choice" }, element("legend", {}, label), chips),
+    add(choice: Named) {
+      offer(choice).checked = true;
+    },
     get value() {
       const ticked = boxes.filter((box) => box.checked).map((box) => Number(box.value));
       return ticked.sort((one, other) => one - other);
     },
     set value(ids: number[]) {
       for (const box of boxes) box.checked = ids.includes(Number(box.value));
+    },
+  };
+}
+
+export interface FileField {
+  readonly root: HTMLElement;
+  readonly input: HTMLInputElement;
+  /** Null until one is chosen. */
+  readonly file: File | null;
+}
+
+/** `accept` as browsers take it: ".png,.jpg". */
+export function fileField(label: string, accept: string, hint = ""): FileField {
+  const input = element("input", { class: "input", type: "file", accept });
+  return {
+    root: labelled(label, input, hint),
+    input,
+    get file() {
+      return input.files?.[0] ?? null;
     },
   };
 }

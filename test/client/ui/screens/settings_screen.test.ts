@@ -141,6 +141,50 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await vi.waitFor(() => expect(setup.asked[1]).toEqual(["Camera.Order", { id: [1, 2] }]), 5000);
   }, 20_000);
 
+  test("a camera's new group is ticked; a group keeps the cameras that were removed", async () => {
+    setup.group.splice(0, Infinity, { id: 3, revision: 1, name: "Yard", camera: [1, 99], deniedTo: ["guard"] });
+    const page = await open("cameras&open=2");
+    await page.getByRole("button", { name: "New group…" }).click();
+    const dialog = page.getByRole("dialog", { name: "New group" });
+    await dialog.getByLabel("Name").fill("Doors");
+    await dialog.getByLabel("Name").press("Enter");
+    await dialog.waitFor({ state: "detached" });
+    await save(page);
+    await page.getByText("The camera is saved.").waitFor();
+    expect(setup.asked, "the dialog's form saves no camera").toEqual([
+      ["Group.Add", { name: "Doors", camera: [] }],
+      ["camera", { id: 2, revision: 1, group: [7] }],
+    ]);
+    setup.asked.length = 0;
+    await page.evaluate(() => void (location.hash = "#settings=groups&open=3"));
+    await page.getByText("Gate", { exact: true }).click();
+    await save(page);
+    await page.getByText("The group is saved.").waitFor();
+    expect(setup.asked).toEqual([["group", { id: 3, revision: 1, camera: [1, 2, 99] }]]);
+    await page.getByRole("button", { name: "Remove this group…" }).click();
+    await page.getByText("It is denied to guard").waitFor();
+    setup.group.length = 0;
+  }, 20_000);
+
+  test("a map that someone else has changed is renamed once the user has said so again", async () => {
+    setup.emap.length = 0;
+    const page = await open("maps");
+    await page.getByText("There are no maps yet.").waitFor();
+    const map = { id: 1, revision: 5, name: "Ground floor", picture: "", items: 2, linkedFrom: [] };
+    setup.emap.push({ ...map });
+    await page.reload();
+    await page.getByRole("button", { name: "Rename Ground floor" }).click();
+    Object.assign(setup.emap[0]!, { revision: 6, name: "Basement" });
+    const dialog = page.getByRole("dialog", { name: "Rename Ground floor" });
+    await dialog.getByLabel("Name").fill("Cellar");
+    await dialog.getByRole("button", { name: "Rename" }).click();
+    await dialog.getByText("Someone else has changed Basement").waitFor();
+    expect(setup.asked).toEqual([]);
+    await dialog.getByRole("button", { name: "Rename" }).click();
+    await page.getByRole("heading", { name: "Cellar" }).waitFor();
+    expect(setup.asked).toEqual([["emap", { id: 1, revision: 6, name: "Cellar" }]]);
+  }, 20_000);
+
   test("rights are stored as what is denied; a new password takes the manager's own", async () => {
     const page = await open("accounts&open=2");
     await page.getByLabel("All cameras: Sound").click();

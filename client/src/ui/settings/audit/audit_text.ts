@@ -7,7 +7,7 @@ import { yesNo } from "../../widgets/text";
 import { weekText } from "../cameras/plan";
 
 /** Where the user knows it by another name. */
-const kAreas: Record<string, string> = { user: "account" };
+const kAreas: Record<string, string> = { user: "account", group: "camera group", emap: "map" };
 const kVerbs: Record<string, string> = {
   add: "added",
   set: "changed",

@@ -3,10 +3,17 @@
 // The settings of a camera as fields. Those of a new one begin with its connection; the rest is shown once a test has
 // succeeded, or was skipped.
 
-import type { CameraRecord, CameraSettings, CameraSetup, CameraSetupList, ProbeResult } from "../../../wire/camera_setup";
+import type {
+  CameraRecord,
+  CameraSettings,
+  CameraSetup,
+  CameraSetupList,
+  Named,
+  ProbeResult,
+} from "../../../wire/camera_setup";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
-import { checkField, chipsField, formPart, selectField, textField, type Field } from "../../widgets/fields";
+import { checkField, chipsField, formPart, selectField, textField, type ChipsField } from "../../widgets/fields";
 import type { RecordFields } from "../record_page";
 import { addressProblem } from "./address";
 import { ConnectionFields } from "./connection_fields";
@@ -24,19 +31,25 @@ export class CameraFields implements RecordFields<CameraSettings> {
     "Stream of the live view",
     kProfiles.map((text, profile) => [String(profile), text] as const),
   );
-  readonly #groups: Field<number[]>;
+  readonly #groups: ChipsField;
   readonly #plan: PlanField;
   readonly #rest = element("div", { class: "form-group" });
   readonly #skip = button("Skip the test", () => this.#showRest(), "plain");
   #codec = "";
 
-  /** `isWhole`: all fields are shown from the beginning. */
-  constructor(setup: CameraSetup, camera: CameraRecord | null, list: CameraSetupList, isWhole: boolean) {
+  /** `isWhole`: all fields are shown from the beginning. `addGroup` makes a group, or null where the user would not. */
+  constructor(
+    setup: CameraSetup,
+    camera: CameraRecord | null,
+    list: CameraSetupList,
+    isWhole: boolean,
+    addGroup: () => Promise<Named | null>,
+  ) {
     this.#camera = camera;
     this.#groups = chipsField("Groups", list.group);
     this.#plan = new PlanField(list.mount);
     this.#connection = new ConnectionFields(setup, camera, list, (result) => this.#take(result));
-    this.#groups.root.hidden = list.group.length === 0;
+    this.#groups.root.append(button("New group…", () => void this.#addGroup(addGroup), "plain"));
     this.#enabled.root.hidden = camera === null;
     const about = [this.#name, this.#enabled, this.#groups, this.#live, this.#audio, this.#ptz];
     this.#rest.append(formPart("Camera", ...about.map(({ root }) => root)), formPart("Recording", this.#plan.root));
@@ -105,6 +118,11 @@ export class CameraFields implements RecordFields<CameraSettings> {
 
   close(): void {
     this.#connection.close();
+  }
+
+  async #addGroup(ask: () => Promise<Named | null>): Promise<void> {
+    const group = await ask();
+    if (group) this.#groups.add(group);
   }
 
   #take({ codec, audio }: ProbeResult): void {

@@ -11,6 +11,7 @@ import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
 import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
+import { askForGroup } from "../groups/ask_for_group";
 import { CameraFields } from "./camera_fields";
 import { stateText } from "./camera_row";
 import { kFirstPlan, planText } from "./plan";
@@ -74,7 +75,11 @@ export class CameraPage extends RecordPage<CameraSetupList, CameraSettings, Came
 
   protected newFields(camera: CameraRecord | null, list: CameraSetupList): CameraFields {
     const isWhole = camera !== null || this.context.draft !== null;
-    this.#fields = new CameraFields(this.#setup, camera, list, isWhole);
+    this.#fields = new CameraFields(this.#setup, camera, list, isWhole, async () => {
+      const group = await askForGroup(this.root, this.context.server);
+      if (group) list.group.push(group);
+      return group;
+    });
     return this.#fields;
   }
 

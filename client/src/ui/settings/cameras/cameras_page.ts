@@ -29,7 +29,9 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
   #ordering: ReturnType<typeof setTimeout> | null = null;
 
   constructor(context: PageContext) {
-    super(context, "Cameras", linkButton("Add a camera", settingsAddress("cameras", "new"), true));
+    const groups = linkButton("Groups", settingsAddress("groups"));
+    const add = linkButton("Add a camera", settingsAddress("cameras", "new"), true);
+    super(context, "Cameras", element("div", { class: "form-buttons" }, groups, add));
     this.#setup = new CameraSetup(context.server);
     const ask = (footage: boolean) => () => this.#setup.list({ footage });
     void this.start(ask(true), (list) => {
