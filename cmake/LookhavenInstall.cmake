@@ -10,7 +10,8 @@ set(LOOKHAVEN_INSTALL_FOLDER lib/lookhaven)
 # lookhaven_install(): call it when all targets are known.
 function(lookhaven_install)
     set(programs lookhaven lookhaven-recorder lookhaven-webapi lookhaven-camera)
-    set(libraries lookhaven_player lookhaven_binding lookhaven_decoder lookhaven_remux lookhaven_remote_library)
+    set(libraries lookhaven_player lookhaven_binding lookhaven_decoder lookhaven_remux lookhaven_remote_library
+        lookhaven_signature)
     set_target_properties(${programs} PROPERTIES INSTALL_RPATH "$ORIGIN/../lib")
     set_target_properties(${libraries} PROPERTIES INSTALL_RPATH "$ORIGIN")
     install(TARGETS ${programs} RUNTIME DESTINATION ${LOOKHAVEN_INSTALL_FOLDER}/bin COMPONENT lookhaven)

@@ -19,6 +19,7 @@
 #include "standalone/binding/rights.h"
 #include "standalone/control/flush_request.h"
 #include "standalone/evidence/manifest.h"
+#include "standalone/evidence/signing_key.h"
 #include "standalone/evidence/write.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/store/cameras.h"
@@ -159,14 +160,18 @@ std::string PlanExport(const Call& call) {
 
 std::string Export(const Call& call) {
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    const std::filesystem::path key = call.context.Installation().SigningKeyFile();
+    evidence::LoadSignatureLibrary();
     OccupyExport(call);
+    evidence::RequireSigningKey(key);  // before any footage is read
     const evidence::Plan plan = PlanOf(call, remux);
     LogExport(call, plan.request);
     call.context.NoteStream();  // the plan has the limits of a search
     SendAttachmentHead(plan.content_type, plan.name, plan.size_bytes);
     try {
-        evidence::Write(plan, remux,
-                        [](auto bytes) { return base::WriteAll(STDOUT_FILENO, bytes.data(), bytes.size()); });
+        evidence::Write(
+            plan, remux, [](auto bytes) { return base::WriteAll(STDOUT_FILENO, bytes.data(), bytes.size()); },
+            [&key](std::string_view manifest) { return evidence::SignBy(key, manifest); });
     } catch (const std::system_error& error) {
         if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
             throw;

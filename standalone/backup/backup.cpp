@@ -31,6 +31,8 @@ constexpr const char* kManifest = "manifest.json";
 constexpr const char* kRecords = "records.db";
 constexpr const char* kPictures = "emaps";
 constexpr const char* kCertificate = "tls";
+constexpr const char* kSigning = "signing";
+constexpr std::string_view kSigningKey = "key.pem";
 // The last one says which of them Lookhaven made itself.
 constexpr std::array<std::string_view, 3> kCertificateFiles = {"certificate.pem", "key.pem", "made-here"};
 
@@ -65,7 +67,7 @@ std::string SqliteUrl(const fs::path& path) {
     return "sqlite:" + path.string();
 }
 
-// Of the manifest, of a file of the certificate, and of how many files there may be.
+// Of the manifest, of a file of the certificate, of the signing key, and of how many files there may be.
 constexpr std::uintmax_t kMaxTextBytes = std::uintmax_t{1} << 20U;
 constexpr std::size_t kMaxFiles = 10'000;
 
@@ -85,6 +87,9 @@ std::optional<std::uintmax_t> MaxBytesOf(std::string_view name, const fs::path& 
     }
     if (name.substr(0, slash) == kCertificate &&
         std::ranges::find(kCertificateFiles, file) != kCertificateFiles.end()) {
+        return kMaxTextBytes;
+    }
+    if (name.substr(0, slash) == kSigning && file == kSigningKey) {
         return kMaxTextBytes;
     }
     return std::nullopt;
@@ -160,7 +165,7 @@ Summary CheckManifest(const fs::path& path, const std::map<std::string, FileDige
 
 // Unpacks everything below the folder, and throws Malformed for what is not whole.
 Summary Unpack(int descriptor, const WorkFolder& folder) {
-    for (const char* name : {kPictures, kCertificate}) {
+    for (const char* name : {kPictures, kCertificate, kSigning}) {
         fs::create_directory(folder / name);
     }
     TarReader tar(descriptor);
@@ -215,6 +220,7 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     summary.pictures = writer.AddFolder(kPictures, installation.Home() / kPictures);
     if (certificate == Certificate::kIncluded) {
         summary.has_certificate = writer.AddFolder(kCertificate, installation.TlsFolder()) > 0;
+        writer.AddFolder(kSigning, installation.SigningKeyFile().parent_path());
     }
     writer.Finish(summary);
     return summary;
@@ -234,6 +240,7 @@ Summary Restore(const base::Installation& installation, int descriptor) {
     summary.pictures = MoveFiles(folder / kPictures, installation.Home() / kPictures);
     summary.records = CopyRecords(source, target, store::CopySessions::kNo);
     summary.has_certificate = MoveFiles(folder / kCertificate, installation.TlsFolder()) > 0;
+    MoveFiles(folder / kSigning, installation.SigningKeyFile().parent_path());
     return summary;
 }
 

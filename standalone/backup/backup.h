@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What an owner needs to set up the same installation on another machine: its records and pictures of e-maps, and, on
-// request, its certificate; not its recordings.
+// request, its certificate and the key that signs exports; not its recordings.
 //
 // Why so        Records are copied row by row into a SQLite file, whatever engine keeps them, so that a backup of
 //               either can be restored into either, and an older one into a newer program.
@@ -17,7 +17,7 @@
 
 namespace lookhaven::backup {
 
-enum class Certificate { kLeftOut, kIncluded };
+enum class Certificate { kLeftOut, kIncluded };  // with it the key that signs exports
 
 struct Summary {
     std::string version;  // of the program that made the backup

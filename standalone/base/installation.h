@@ -27,6 +27,7 @@ class Installation {
     std::filesystem::path RunFolder() const { return home_ / "run"; }
     std::filesystem::path LogFolder() const { return home_ / "log"; }
     std::filesystem::path TlsFolder() const { return home_ / "tls"; }
+    std::filesystem::path SigningKeyFile() const { return home_ / "signing" / "key.pem"; }
     std::filesystem::path ProgressFolder() const { return RunFolder() / "progress"; }
     std::filesystem::path WebApiSocket() const { return RunFolder() / "webapi.sock"; }
 

@@ -66,7 +66,8 @@ void AddBackup(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console);
     group.Add("backup", "Writes records, e-maps and, on request, the certificate to a file, while running", Backup)
         .Option("file", group.request().file, "A file that does not exist yet, such as backup.tar.zst", Required)
-        .Flag("--certificate", group.request().with_certificate, "Also the certificate and its key");
+        .Flag("--certificate", group.request().with_certificate,
+              "Also the certificate, its key, and the key that signs exports");
     group.Add("restore", "Restores a backup into an installation that was just set up and is stopped", Restore)
         .Option("file", group.request().file, "The backup", Required);
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven export: takes a span of several cameras away as one file, and checks such a file.
+// lookhaven export: takes a span of several cameras away as one file.
 #include <algorithm>
 #include <ctime>
 #include <filesystem>
@@ -15,9 +15,10 @@
 #include "standalone/base/io.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/export_verification.h"
+#include "standalone/cli/export_checks.h"
 #include "standalone/cli/units.h"
 #include "standalone/evidence/manifest.h"
+#include "standalone/evidence/signing_key.h"
 #include "standalone/evidence/write.h"
 #include "standalone/media/source.h"
 #include "standalone/store/cameras.h"
@@ -33,7 +34,6 @@ struct Request {
     std::string from;
     std::string to = "now";
     bool no_sound = false;
-    std::string file;  // to verify
 };
 
 int CameraId(const std::string& text) {
@@ -91,10 +91,12 @@ evidence::Plan RequirePlan(store::Store& store, const Request& request, const me
     return plan;
 }
 
-void WriteTo(int output, const evidence::Plan& plan, const media::RemuxLibrary& remux) {
+void WriteTo(int output, const evidence::Plan& plan, const media::RemuxLibrary& remux,
+             const std::filesystem::path& key) {
     try {
-        evidence::Write(plan, remux,
-                        [output](auto bytes) { return base::WriteAll(output, bytes.data(), bytes.size()); });
+        evidence::Write(
+            plan, remux, [output](auto bytes) { return base::WriteAll(output, bytes.data(), bytes.size()); },
+            [&key](std::string_view manifest) { return evidence::SignBy(key, manifest); });
     } catch (const media::SourceError& error) {
         throw Failure(kDataError, error.what());
     }
@@ -107,9 +109,11 @@ void Export(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     const evidence::Plan plan = RequirePlan(store, request, remux);
+    const std::filesystem::path key = console.Installation().SigningKeyFile();
+    evidence::RequireSigningKey(key);
     const std::string& file = request.cameras_and_file.back();
     if (file == "-") {
-        WriteTo(STDOUT_FILENO, plan, remux);
+        WriteTo(STDOUT_FILENO, plan, remux, key);
         return;
     }
     if (::access(file.c_str(), F_OK) == 0) {
@@ -117,7 +121,7 @@ void Export(const Console& console, const Request& request) {
     }
     const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
     try {
-        WriteTo(output.Get(), plan, remux);
+        WriteTo(output.Get(), plan, remux, key);
     } catch (...) {
         std::error_code ignored;
         std::filesystem::remove(file, ignored);  // leaves no incomplete file behind
@@ -133,20 +137,6 @@ void Export(const Console& console, const Request& request) {
         gaps == 0 ? "." : Concat("; ", gaps, gaps == 1 ? " gap" : " gaps", " without footage."));
 }
 
-void Verify(const Console& console, const Request& request) {
-    const ExportVerification verification = VerifyExport(request.file);
-    std::string text;
-    for (const std::string& fault : verification.faults) {
-        text += fault + '\n';
-    }
-    console.Answer(Object("files", verification.files, "faults",
-                          Array(verification.faults, [](const std::string& fault) { return Json::Value(fault); })),
-                   text, verification.files, verification.files == 1 ? " file is" : " files are", " unchanged.");
-    if (!verification.faults.empty()) {
-        throw Failure(kFindings, "this export was changed after it was made");
-    }
-}
-
 }  // namespace
 
 void AddExport(CLI::App& program, const Console& console) {
@@ -154,17 +144,15 @@ void AddExport(CLI::App& program, const Console& console) {
     CLI::App* app = program.add_subcommand("export", "Takes footage of cameras away as one file, without transcoding");
     app->add_option(
            "camera", request->cameras_and_file,
-           "The cameras' ids, and last the file to create; as .zip with a manifest of times, gaps and hashes; -"
+           "The cameras' ids, and last the file to create; as .zip with a signed manifest of times, gaps and hashes; -"
            " for standard output")
         ->type_name("CAMERA... FILE");
     app->add_option("--from", request->from, "Footage from this time on, such as '2026-03-01 08:15' or -2h");
     app->add_option("--to", request->to, "Footage up to this time (default: now)");
     app->add_flag("--no-sound", request->no_sound, "Leave out the audio");
-    CLI::App* verify = app->add_subcommand("verify", "Checks that an exported .zip file is as it was made");
-    verify->add_option("file", request->file, "The file")->required();
-    verify->callback([&console, request] { Verify(console, *request); });
-    app->callback([&console, request, verify] {
-        if (!verify->parsed()) {
+    AddExportChecks(*app, console);
+    app->callback([&console, request, app] {
+        if (app->get_subcommands().empty()) {
             Export(console, *request);
         }
     });

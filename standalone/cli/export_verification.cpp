@@ -16,6 +16,7 @@
 #include "standalone/base/text.h"
 #include "standalone/cli/console.h"
 #include "standalone/evidence/manifest.h"
+#include "standalone/evidence/signature_library.h"
 
 namespace lookhaven::cli {
 
@@ -27,7 +28,7 @@ constexpr std::size_t kMaxMembers = 100'000;
 
 struct Member {
     std::string sha256;
-    std::string text;  // of the manifest
+    std::string text;  // of the manifest, of its signature and of the key
 };
 
 struct FreeArchive {
@@ -52,7 +53,9 @@ class Zip {
             }
             const char* name = archive_entry_pathname_utf8(entry);
             const std::string known = name == nullptr ? "" : name;
-            if (!members.emplace(known, ReadMember(known == evidence::kManifestName)).second) {
+            const bool keeps_text = known == evidence::kManifestName || known == evidence::kSignatureName ||
+                                    known == evidence::kPublicKeyName;
+            if (!members.emplace(known, ReadMember(keeps_text)).second) {
                 throw Failure(kDataError, file_, " has two files of one name");
             }
         }
@@ -126,18 +129,42 @@ std::map<std::string, std::string> HashesOf(const std::string& file, const std::
     throw Failure(kDataError, "the manifest in ", file, " is damaged");
 }
 
+using Members = std::map<std::string, Member>;
+
+// Takes signature and key out of the members. An export of an earlier version has neither.
+void CheckSignature(Members& members, const std::string& manifest, ExportVerification& verification) {
+    const auto signature = members.extract(evidence::kSignatureName);
+    const auto key = members.extract(evidence::kPublicKeyName);
+    if (signature.empty() && key.empty()) {
+        return;
+    }
+    if (signature.empty() || key.empty()) {
+        verification.faults.push_back(
+            Concat(signature.empty() ? evidence::kSignatureName : evidence::kPublicKeyName, " is missing"));
+        return;
+    }
+    const evidence::SignatureLibrary& library = evidence::LoadSignatureLibrary();
+    if (library.IsSignatureOf(manifest, {signature.mapped().text, key.mapped().text})) {
+        verification.fingerprint = library.FingerprintOf(key.mapped().text);
+    } else {
+        verification.faults.push_back(
+            Concat(evidence::kManifestName, ", its signature or its key was changed: they do not belong together"));
+    }
+}
+
 }  // namespace
 
 ExportVerification VerifyExport(const std::string& file) {
     if (::access(file.c_str(), R_OK) != 0) {
         throw Failure(kNoInput, "there is no file ", file, ", or it cannot be read");
     }
-    std::map<std::string, Member> members = Zip(file).ReadAll();
+    Members members = Zip(file).ReadAll();
     const auto manifest = members.extract(evidence::kManifestName);
     if (manifest.empty()) {
         throw Failure(kDataError, file, " has no ", evidence::kManifestName, ", so it is no export");
     }
     ExportVerification verification;
+    CheckSignature(members, manifest.mapped().text, verification);
     for (const auto& [name, sha256] : HashesOf(file, manifest.mapped().text)) {
         const auto member = members.extract(name);
         if (member.empty()) {

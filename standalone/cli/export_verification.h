@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Compares an exported ZIP file with the hashes that it carries.
+// Compares an exported ZIP file with the hashes that it carries, and these with their signature.
 #pragma once
 
 #include <string>
@@ -11,6 +11,8 @@ namespace lookhaven::cli {
 struct ExportVerification {
     int files = 0;                    // that are as the manifest says
     std::vector<std::string> faults;  // a sentence each
+    // Of the key that signed the manifest: 64 hexadecimal digits. Empty when nobody did, or not this manifest.
+    std::string fingerprint;
 };
 
 // Throws Failure when there is no file, or one that is no export at all or cut.

@@ -16,6 +16,9 @@
 namespace lookhaven::evidence {
 
 constexpr const char* kManifestName = "manifest.json";
+// Beside it: its signature, 64 bytes, and the public key to check that with, in PEM format.
+constexpr const char* kSignatureName = "manifest.json.sig";
+constexpr const char* kPublicKeyName = "manifest.json.pub";
 constexpr const char* kManifestFormat = "lookhaven export 1";
 
 // More of them in one file are told as fewer and longer ones.

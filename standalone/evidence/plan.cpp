@@ -9,6 +9,7 @@
 
 #include "standalone/base/log.h"
 #include "standalone/evidence/manifest.h"
+#include "standalone/evidence/signature_library.h"
 #include "standalone/evidence/zip_writer.h"
 #include "standalone/media/source.h"
 
@@ -136,6 +137,8 @@ std::int64_t SizeOfArchive(const Plan& plan) {
         }
     }
     zip.Skip(kManifestName, ManifestBytes(plan));
+    zip.Skip(kSignatureName, kSignatureBytes);
+    zip.Skip(kPublicKeyName, kPublicKeyBytes);
     zip.End();
     return zip.Position();
 }

@@ -2,6 +2,7 @@
 #include "standalone/evidence/write.h"
 
 #include <algorithm>
+#include <stdexcept>
 #include <string>
 #include <utility>
 
@@ -75,6 +76,22 @@ WrittenFile AddFile(ZipWriter& zip, const File& file, const media::RemuxLibrary&
     return {hash.Finish(), missing.Take()};
 }
 
+void AddText(ZipWriter& zip, const std::string& name, const std::string& text) {
+    zip.BeginFile(name, std::ssize(text));
+    zip.WriteData({reinterpret_cast<const std::uint8_t*>(text.data()), text.size()});
+    zip.EndFile();
+}
+
+void AddManifest(ZipWriter& zip, const std::string& manifest, const Signer& sign) {
+    const Signature signature = sign(manifest);
+    if (signature.bytes.size() != kSignatureBytes || signature.public_key.size() != kPublicKeyBytes) {
+        throw std::logic_error("a signature is not as long as it was announced");
+    }
+    AddText(zip, kManifestName, manifest);
+    AddText(zip, kSignatureName, signature.bytes);
+    AddText(zip, kPublicKeyName, signature.public_key);
+}
+
 void WriteFile(const File& file, const media::RemuxLibrary& remux, const media::ByteSink& sink) {
     Missing missing(false);
     if (!JoinFile(file, remux, sink, missing)) {
@@ -84,7 +101,7 @@ void WriteFile(const File& file, const media::RemuxLibrary& remux, const media::
 
 }  // namespace
 
-void Write(const Plan& plan, const media::RemuxLibrary& remux, const media::ByteSink& sink) {
+void Write(const Plan& plan, const media::RemuxLibrary& remux, const media::ByteSink& sink, const Signer& sign) {
     ZipWriter zip(sink, plan.request.now_ms + std::int64_t{60'000} * plan.request.utc_offset_min);
     std::vector<WrittenFile> written;
     for (const Camera& camera : plan.cameras) {
@@ -96,10 +113,7 @@ void Write(const Plan& plan, const media::RemuxLibrary& remux, const media::Byte
             written.push_back(AddFile(zip, file, remux));
         }
     }
-    const std::string manifest = ManifestOf(plan, written);
-    zip.BeginFile(kManifestName, std::ssize(manifest));
-    zip.WriteData({reinterpret_cast<const std::uint8_t*>(manifest.data()), manifest.size()});
-    zip.EndFile();
+    AddManifest(zip, ManifestOf(plan, written), sign);
     zip.End();
 }
 

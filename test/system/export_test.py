@@ -49,18 +49,59 @@ class ExportTest(unittest.TestCase):
             self.assertEqual([camera["id"] for camera in manifest["camera"]], [1, 2])
             self.assertEqual(manifest["exported"]["by"], "guard")
             files = [file for camera in manifest["camera"] for file in camera["file"]]
-            self.assertEqual({file["name"] for file in files} | {"manifest.json"}, set(archive.namelist()))
+            beside = {"manifest.json", "manifest.json.sig", "manifest.json.pub"}
+            self.assertEqual({file["name"] for file in files} | beside, set(archive.namelist()))
             for file in files:
                 data = archive.read(file["name"])
                 self.assertEqual(hashlib.sha256(data).hexdigest(), file["sha256"])
                 self.assertEqual(len(self.probe(data)), 2 if file["sound"] else 1)
         self.assertTrue(all(camera["gap"] for camera in manifest["camera"]))
-        out = Path(self.server.home) / "mine.zip"
-        out.write_bytes(answer.body)
-        self.assertIn("files are unchanged", self.server.cli("export", "verify", str(out)))
-        out.write_bytes(answer.body.replace(files[0]["sha256"].encode(), b"0" * 64))
-        with self.assertRaisesRegex(AssertionError, "was changed"):
-            self.server.cli("export", "verify", str(out))
+
+    def signed_by(self, folder, key, manifest):
+        """Signature and public key that somebody else makes with OpenSSL."""
+        def openssl(*arguments):
+            subprocess.run(["openssl", *arguments], cwd=folder, capture_output=True, timeout=60, check=True)
+        (folder / "text").write_bytes(manifest)
+        openssl("genpkey", "-algorithm", "ED25519", "-out", key)
+        openssl("pkey", "-in", key, "-pubout", "-out", "pub")
+        openssl("pkeyutl", "-sign", "-inkey", key, "-rawin", "-in", "text", "-out", "sig")
+        return {"manifest.json.sig": (folder / "sig").read_bytes(), "manifest.json.pub": (folder / "pub").read_bytes()}
+
+    def test_a_signature_tells_whose_the_file_is_and_whether_it_was_changed(self):
+        with zipfile.ZipFile(io.BytesIO(self.ask("guard", cameralists="1", archive="true").body)) as archive:
+            made = {name: archive.read(name) for name in archive.namelist()}
+        footage, manifest = next(name for name in made if not name.startswith("manifest")), "manifest.json"
+        key = json.loads(self.server.cli("export", "key", "--json"))["fingerprint"]
+        self.assertEqual((self.server.home / "signing/key.pem").stat().st_mode & 0o777, 0o600)
+        changed = bytes([*made[footage][:-1], made[footage][-1] ^ 1])
+        lie = made[manifest].replace(b'"guard"', b'"bob"  ')
+        hashed_anew = made[manifest].replace(json.loads(made[manifest])["camera"][0]["file"][0]["sha256"].encode(),
+                                             hashlib.sha256(changed).hexdigest().encode())
+        unsigned = {"manifest.json.sig": None, "manifest.json.pub": None}
+        rows = [
+            ("as made", {}, (0, "own"), (0, "named")),
+            ("changed byte", {footage: changed}, (1, "own"), (1, "named")),
+            ("changed manifest", {manifest: lie}, (1, "nobody"), (1, "nobody")),
+            ("changed byte and hash", {footage: changed, manifest: hashed_anew}, (1, "nobody"), (1, "nobody")),
+            ("no signature", {"manifest.json.sig": None}, (1, "nobody"), (1, "nobody")),
+            ("neither signature nor key", {footage: changed, manifest: hashed_anew, **unsigned}, (2, "nobody"), (1, "nobody")),
+        ]
+        with tempfile.TemporaryDirectory() as folder:
+            folder = Path(folder)
+            others = self.signed_by(folder, "other", hashed_anew)
+            rows.append(("other key", {footage: changed, manifest: hashed_anew, **others}, (2, "unknown"), (1, "other")))
+            for what, changes, *expected in rows:
+                path = folder / "copy.zip"
+                with zipfile.ZipFile(path, "w") as archive:
+                    for name, data in {**made, **changes}.items():
+                        if data is not None:
+                            archive.writestr(name, data)
+                for options, wanted in zip(([], ["--key", key.upper()]), expected, strict=True):
+                    with self.subTest(what, options=options):
+                        program = Path(self.server.environment["LOOKHAVEN_BUILD_FOLDER"], "bin/lookhaven")
+                        done = subprocess.run([program, "export", "verify", path, "--json", *options], text=True,
+                                              env=self.server.environment, capture_output=True, timeout=60)
+                        self.assertEqual((done.returncode, json.loads(done.stdout)["signer"]), wanted, done.stderr)
 
     def test_who_may_not_see_or_hear_gets_nothing_of_it(self):
         heard = self.probe(self.ask("guard", cameralists="2").body)

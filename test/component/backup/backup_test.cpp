@@ -56,16 +56,24 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
         image = store::Emaps(store).Find(map)->image;
     }
     base::WriteFileAtomically(old_.TlsFolder() / "key.pem", "secret");
+    fs::create_directory(old_.SigningKeyFile().parent_path());
+    base::WriteFileAtomically(old_.SigningKeyFile(), "signs exports");
     fs::create_directory(old_.RunFolder() / "backup");  // what a killed one left
     std::ofstream(old_.RunFolder() / "backup" / "records.db") << "half";
 
     EXPECT_FALSE(Write(Certificate::kLeftOut).has_certificate);
+    fs::copy_file(File("backup"), File("without"));
     EXPECT_TRUE(Write(Certificate::kIncluded).has_certificate);
     EXPECT_FALSE(fs::exists(old_.RunFolder() / "backup"));
     const Summary restored = Restore("backup");
     EXPECT_EQ(restored.version, "1.2.3");
     EXPECT_EQ(restored.pictures, 1);
     EXPECT_EQ(base::ReadFile(new_.TlsFolder() / "key.pem"), "secret");
+    EXPECT_EQ(base::ReadFile(new_.SigningKeyFile()), "signs exports");
+    EXPECT_EQ(fs::status(new_.SigningKeyFile().parent_path()).permissions(), fs::perms::owner_all);
+    const base::Installation third = SetUpHome(folder_ / "third");
+    backup::Restore(third, base::OpenFile(File("without"), O_RDONLY).Get());
+    EXPECT_FALSE(fs::exists(third.SigningKeyFile()));
     store::Store store = store::Store::Open(new_.StoreUrl());
     EXPECT_TRUE(store::Users(store).CheckPassword("bob", "correct horse"));
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(image), "<svg/>");

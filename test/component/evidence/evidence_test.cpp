@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Exports as others read them: ffprobe, Python's zipfile and sha256sum.
+// Exports as others read them: ffprobe, Python's zipfile, sha256sum and openssl.
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -10,6 +10,7 @@
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
 #include "standalone/evidence/manifest.h"
+#include "standalone/evidence/signing_key.h"
 #include "standalone/evidence/write.h"
 #include "standalone/evidence/zip_writer.h"
 #include "standalone/media/source.h"
@@ -40,10 +41,15 @@ class Evidence : public testing::Test {
         plan_ = MakePlan(request, remux);
         const std::filesystem::path out = folder_ / plan_.name;
         const base::FileDescriptor file = base::OpenFile(out, O_WRONLY | O_CREAT | O_TRUNC);
-        evidence::Write(plan_, remux,
-                        [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); });
+        const auto sink = [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); };
+        evidence::Write(plan_, remux, sink, Sign());
         EXPECT_EQ(static_cast<std::int64_t>(std::filesystem::file_size(out)), plan_.size_bytes);
         return out;
+    }
+
+    Signer Sign() const {
+        RequireSigningKey(key_);
+        return [this](std::string_view manifest) { return SignBy(key_, manifest); };
     }
 
     static Request Ask(std::vector<CameraFootage> cameras, std::int64_t begin_ms, std::int64_t end_ms) {
@@ -57,6 +63,7 @@ class Evidence : public testing::Test {
     static std::string Quoted(const std::filesystem::path& path) { return "'" + path.string() + "'"; }
 
     ArchiveFolder folder_;
+    const std::filesystem::path key_ = folder_ / "signing" / "key.pem";
     Plan plan_;
 };
 
@@ -108,7 +115,14 @@ TEST_F(Evidence, SeveralBecomeAnArchiveWhoseManifestIsTrue) {
                     " && python3 -c \"import zipfile, sys; z = zipfile.ZipFile(sys.argv[1]);"
                     " print(z.testzip(), len(z.namelist())); z.extractall()\" " +
                     Quoted(out)),
-              "None 5\n");
+              "None 7\n");
+    EXPECT_EQ(Shell("cd " + Quoted(folder_.Path()) +
+                    " && openssl pkeyutl -verify -pubin -inkey manifest.json.pub -rawin -in manifest.json"
+                    " -sigfile manifest.json.sig && stat -c %a signing signing/key.pem"),
+              "Signature Verified Successfully\n700\n600\n");
+    EXPECT_EQ(Shell("cd " + Quoted(folder_.Path()) +
+                    " && openssl pkey -pubin -in manifest.json.pub -outform DER | sha256sum"),
+              LoadSignatureLibrary().FingerprintOf(Contents(folder_ / kPublicKeyName)) + "  -\n");
     Json::Value manifest;
     std::istringstream(Contents(folder_ / kManifestName)) >> manifest;
     EXPECT_EQ(manifest["exported"]["by"], "admin");
@@ -148,7 +162,8 @@ TEST_F(Evidence, WhatCannotBeReadIsLeftOutAndTold) {
     std::filesystem::remove(other);
     const std::filesystem::path out = folder_ / "lossy.zip";
     const base::FileDescriptor file = base::OpenFile(out, O_WRONLY | O_CREAT);
-    evidence::Write(plan, remux, [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); });
+    evidence::Write(
+        plan, remux, [&](auto bytes) { return base::WriteAll(file.Get(), bytes.data(), bytes.size()); }, Sign());
     EXPECT_EQ(static_cast<std::int64_t>(std::filesystem::file_size(out)), plan.size_bytes);
     EXPECT_EQ(Shell("cd " + Quoted(folder_.Path()) +
                     " && python3 -c \"import zipfile, sys;"
@@ -165,7 +180,7 @@ TEST_F(Evidence, WhatCannotBeReadIsLeftOutAndTold) {
     EXPECT_EQ(lost["missing"][0]["begin"], lost["first_frame"]);
     EXPECT_EQ(Shell("sha256sum <" + Quoted(folder_ / lost["name"].asString())), lost["sha256"].asString() + "  -\n");
     request.cameras.pop_back();
-    EXPECT_THROW(evidence::Write(MakePlan(request, remux), remux, [](auto) { return true; }), media::SourceError)
+    EXPECT_THROW(evidence::Write(MakePlan(request, remux), remux, [](auto) { return true; }, {}), media::SourceError)
         << "one file has no manifest to tell it in";
 }
 
@@ -175,13 +190,52 @@ TEST_F(Evidence, WhatIsCutOrCannotBeTakenThrows) {
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     const Plan plan = MakePlan(Ask({{1, "Yard", true, {first, second}}}, 0, 8000), remux);
     std::int64_t taken = 0;
-    EXPECT_THROW(evidence::Write(plan, remux, [&](auto) { return errno = EPIPE, false; }), std::system_error);
+    EXPECT_THROW(evidence::Write(plan, remux, [&](auto) { return errno = EPIPE, false; }, {}), std::system_error);
     std::filesystem::remove(second);
-    EXPECT_THROW(evidence::Write(plan, remux, [&](auto bytes) { return taken += std::ssize(bytes), true; }),
+    EXPECT_THROW(evidence::Write(plan, remux, [&](auto bytes) { return taken += std::ssize(bytes), true; }, {}),
                  media::SourceError);
     EXPECT_LT(taken, plan.size_bytes);
     Write(first, "damaged");
     EXPECT_TRUE(MakePlan(Ask({{1, "Yard", true, {first, second}}}, 0, 8000), remux).cameras[0].files.empty());
+}
+
+TEST_F(Evidence, ASignatureIsOfOneTextAndOneKeyAlone) {
+    const SignatureLibrary& library = LoadSignatureLibrary();
+    RequireSigningKey(key_);
+    const std::string key = Contents(key_);
+    RequireSigningKey(key_);
+    EXPECT_EQ(Contents(key_), key) << "a key that is there stays";
+    const Signature signature = SignBy(key_, "text");
+    const std::filesystem::path other_key = folder_ / "other" / "key.pem";
+    RequireSigningKey(other_key);
+    const Signature other = SignBy(other_key, "text");
+    EXPECT_NE(library.FingerprintOf(other.public_key), library.FingerprintOf(signature.public_key));
+    std::string changed = signature.bytes;
+    changed[63] = static_cast<char>(changed[63] ^ 1);
+    const std::string rsa = Shell("openssl genpkey -quiet -algorithm RSA 2>/dev/null | openssl pkey -pubout");
+    const struct {
+        const char* what;
+        std::string text;
+        Signature signature;
+        bool is_valid;
+    } rows[] = {
+        {"as signed", "text", signature, true},
+        {"other text", "texT", signature, false},
+        {"changed signature", "text", {changed, signature.public_key}, false},
+        {"cut signature", "text", {signature.bytes.substr(1), signature.public_key}, false},
+        {"no signature", "text", {"", signature.public_key}, false},
+        {"other key", "text", {signature.bytes, other.public_key}, false},
+        {"other kind of key", "text", {signature.bytes, rsa}, false},
+        {"no key", "text", {signature.bytes, "none"}, false},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(library.IsSignatureOf(row.text, row.signature), row.is_valid) << row.what;
+    }
+    EXPECT_EQ(library.FingerprintOf(rsa), "");
+    Write(other_key, rsa);
+    EXPECT_THROW(SignBy(other_key, "text"), std::runtime_error);
+    std::filesystem::remove(other_key);
+    EXPECT_THROW(SignBy(other_key, "text"), std::system_error);
 }
 
 TEST_F(Evidence, ArchivesMayBeLargerThan4GiB) {
