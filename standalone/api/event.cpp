@@ -145,7 +145,11 @@ std::string List(const Call& call) {
     Json::Value data;
     data["event"] = Json::arrayValue;
     const Json::Value& kept = call.Parameter("kept");
+    const Json::Value& text = call.Parameter("text");
     if (!kept.isNull() && kept.asBool()) {
+        if (!text.isNull()) {
+            throw Failure(400, "recorded events have no text to look for: leave out kept or text");
+        }
         auto filter = FilterOf<store::EventFilter>(call);
         filter.kept_only = true;
         data["event"] = DescribeWithKeeping(call.Records(), store::Events(call.Records()).List(filter));
@@ -153,8 +157,11 @@ std::string List(const Call& call) {
     }
     auto filter = FilterOf<store::MarkFilter>(call);
     filter.kind = KindOf(call);
+    if (!text.isNull()) {
+        filter.words = store::TextQuery(text.asString());
+    }
     for (const store::Mark& mark : store::Marks(call.Records()).List(filter)) {
-        data["event"].append(Describe(mark));
+        data["event"].append(Describe(mark, filter.words));
     }
     return SuccessAnswer(data);
 }

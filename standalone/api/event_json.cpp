@@ -21,6 +21,17 @@ Json::Value LinesOf(const std::string& text) {
     return lines;
 }
 
+Json::Value PiecesOf(const std::vector<std::vector<std::string>>& lines) {
+    Json::Value json(Json::arrayValue);
+    for (const std::vector<std::string>& pieces : lines) {
+        Json::Value& line = json.append(Json::arrayValue);
+        for (const std::string& piece : pieces) {
+            line.append(piece);
+        }
+    }
+    return json;
+}
+
 void AddKeeping(Json::Value& json, const store::Keeping& keeping) {
     json["note"] = keeping.note;
     json["kept_by"] = keeping.keeper;
@@ -29,7 +40,7 @@ void AddKeeping(Json::Value& json, const store::Keeping& keeping) {
 
 }  // namespace
 
-Json::Value Describe(const store::Mark& mark) {
+Json::Value Describe(const store::Mark& mark, const store::TextQuery& words) {
     Json::Value json;
     json["id"] = mark.id;
     json["kind"] = base::NameOf(store::MarkKindNames(), mark.kind);
@@ -40,6 +51,9 @@ Json::Value Describe(const store::Mark& mark) {
     json["state"] = store::NameOf(mark.state);
     json["reported_by"] = mark.reporter.name;
     json["text"] = LinesOf(mark.text);
+    if (!words.IsEmpty()) {
+        json["found"] = PiecesOf(words.Mark(mark.text));
+    }
     return json;
 }
 

@@ -15,7 +15,8 @@
 
 namespace lookhaven::api {
 
-Json::Value Describe(const store::Mark& mark);
+// words: what it was found by, if it was; what is found of them in its text is told, too.
+Json::Value Describe(const store::Mark& mark, const store::TextQuery& words = {});
 Json::Value Describe(const store::Event& event);
 
 // The same with whether it is kept, and of a recorded event the note and whose it is. A mark is kept when all

@@ -56,6 +56,7 @@ struct Request {
     std::string at = "now";
     std::string length = "0";
     std::vector<std::string> text;
+    std::string words;
 };
 
 std::set<int> ChosenCameras(store::Store& store, const Request& request) {
@@ -97,13 +98,18 @@ Json::Value FindEvents(store::Store& store, const Request& request) {
 
 Json::Value FindMarks(store::Store& store, const Request& request) {
     auto filter = FilterOf<store::MarkFilter>(store, request);
-    filter.kind = static_cast<MarkKind>(request.kind);
-    return Array(Marks(store).List(filter), [](const Mark& mark) { return ToData(mark); });
+    if (request.kind != 0) {
+        filter.kind = static_cast<MarkKind>(request.kind);
+    }
+    if (!request.words.empty()) {
+        filter.words = store::TextQuery(request.words);
+    }
+    return Array(Marks(store).List(filter), [&](const Mark& mark) { return ToData(mark, filter.words); });
 }
 
 void List(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const bool recorded = request.kind == 0;
+    const bool recorded = request.kind == 0 && request.words.empty();
     const Json::Value data = recorded ? FindEvents(store, request) : FindMarks(store, request);
     console.Answer(data, data.empty() ? "There is no such event." : recorded ? EventTable(data) : MarkTable(data));
 }
@@ -272,6 +278,7 @@ void AddEvent(CLI::App& program, const Console& console) {
             .Option("--group", request.group, "Events of the cameras in this group")
             .Option("--mount", request.mount, "Events on this mount")
             .Option("--kind", request.kind, "The kind of events (default: recorded)", OneOf(kKinds))
+            .Option("--text", request.words, "Alerts and POS transactions with these words in their text")
             .Option("--reason", request.reason, "Events recorded for this reason", OneOf(kReasons))
             .Flag("--finished", request.finished, "Leave out events that are still being recorded")
             .Flag("--kept", request.kept, "Only recorded events that are kept")

@@ -34,9 +34,19 @@ std::string StateText(const Json::Value& event) {
     return text;
 }
 
-std::string FirstLine(const Json::Value& text) {
-    const std::string all = text.asString();
-    return all.substr(0, all.find('\n'));
+// The first line, or that in which something was found, with what was found in brackets.
+std::string LineOf(const Json::Value& mark) {
+    for (const Json::Value& pieces : mark["found"]) {
+        std::string line;
+        for (Json::ArrayIndex i = 0; i < pieces.size(); ++i) {
+            line += i % 2 == 0 ? pieces[i].asString() : '[' + pieces[i].asString() + ']';
+        }
+        if (pieces.size() > 1) {
+            return line;
+        }
+    }
+    const std::string text = mark["text"].asString();
+    return text.substr(0, text.find('\n'));
 }
 
 // Nothing for a mark of the command line.
@@ -55,7 +65,7 @@ constexpr Column kEventColumns[] = {{"id", "id"},
                                     {"audio", "audio_codec"},
                                     {"", "", StateText}};
 constexpr Column kMarkColumns[] = {{"id", "id"},       {"camera", "camera_id"},        {"moment", "moment", MomentText},
-                                   {"state", "state"}, {"reported by", "reported_by"}, {"text", "text", FirstLine}};
+                                   {"state", "state"}, {"reported by", "reported_by"}, {"text", "", LineOf}};
 
 }  // namespace
 
@@ -67,11 +77,17 @@ Json::Value ToData(const store::Event& event) {
                   event.height, "path", event.path, "archived", event.archived, "demo", event.demo);
 }
 
-Json::Value ToData(const store::Mark& mark) {
-    return Object("kind", NameOf(store::MarkKindNames(), mark.kind), "id", mark.id, "camera_id", mark.camera_id,
-                  "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text", mark.text, "state",
-                  NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path, "demo", mark.demo, "reported_by",
-                  mark.reporter.name, "reported", mark.reported_s);
+Json::Value ToData(const store::Mark& mark, const store::TextQuery& words) {
+    Json::Value data = Object("kind", NameOf(store::MarkKindNames(), mark.kind), "id", mark.id, "camera_id",
+                              mark.camera_id, "moment", mark.moment_s, "start", mark.start_s, "end", mark.end_s, "text",
+                              mark.text, "state", NameOf(mark.state), "mount_id", mark.mount_id, "path", mark.path,
+                              "demo", mark.demo, "reported_by", mark.reporter.name, "reported", mark.reported_s);
+    if (!words.IsEmpty()) {
+        data["found"] = Array(words.Mark(mark.text), [](const std::vector<std::string>& pieces) {
+            return Array(pieces, [](const std::string& piece) { return Json::Value(piece); });
+        });
+    }
+    return data;
 }
 
 std::string EventTable(const Json::Value& events) {

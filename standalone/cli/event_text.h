@@ -15,7 +15,8 @@ namespace lookhaven::cli {
 
 // All that the record says.
 Json::Value ToData(const store::Event& event);
-Json::Value ToData(const store::Mark& mark);
+// words: what it was found by, if it was.
+Json::Value ToData(const store::Mark& mark, const store::TextQuery& words = {});
 
 // Tables of a list of such data.
 std::string EventTable(const Json::Value& events);

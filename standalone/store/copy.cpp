@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <deque>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -44,6 +45,19 @@ std::vector<std::string> CopiedTables(CopySessions sessions) {
         }
     }
     return tables;
+}
+
+// What SQLite has of its own, in small letters as they are compared.
+std::set<std::string> OwnStatements() {
+    std::set<std::string> own;
+    for (const Migration& migration : Migrations()) {
+        for (std::string statement : migration.on_sqlite) {
+            std::ranges::transform(statement, statement.begin(),
+                                   [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; });
+            own.insert(statement);
+        }
+    }
+    return own;
 }
 
 // A value of either of the two types that columns have.
@@ -168,10 +182,14 @@ void RequireUnused(Store& store) {
 }
 
 void RequireTablesOnly(const std::string& url) {
-    Connection connection(StoreAddress::Parse(url));
-    if (connection.FetchOne<int>("select count(*) from sqlite_master where type not in ('table', 'index')").value() >
-        0) {
-        throw InvalidRecord("the records hold views or triggers, as Lookhaven makes none");
+    const std::set<std::string> own = OwnStatements();
+    for (const std::string& statement :
+         Connection(StoreAddress::Parse(url))
+             .FetchAll<std::string>("select lower(sql) from sqlite_master where type not in ('table', 'index')"
+                                    " or lower(sql) like 'create virtual %'")) {
+        if (!own.contains(statement)) {
+            throw InvalidRecord("the records hold views, triggers or virtual tables that are none of Lookhaven's own");
+        }
     }
 }
 

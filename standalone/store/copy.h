@@ -16,7 +16,7 @@ enum class CopySessions { kNo, kYes };
 void RequireUnused(Store& store);
 
 // For a SQLite file that a stranger may have made, before it is used in any other way: throws InvalidRecord when it
-// holds views or triggers, which would run statements of theirs.
+// holds views, triggers or virtual tables but our own, which would run statements of theirs.
 void RequireTablesOnly(const std::string& url);
 
 // What one moment of the source holds, its counters and settings included, while others go on changing it. The target

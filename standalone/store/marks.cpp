@@ -6,31 +6,16 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
-#include "standalone/store/recording_plans.h"
+#include "standalone/store/mark_row.h"
 #include "standalone/store/step_text.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
 
-template <>
-struct Mapping<Mark> {
-    static constexpr const char* kTable = "marks";
-    static constexpr const char* kColumns =
-        "id, kind, camera_id, moment_s, start_s, end_s, text, state, mount_id, path, demo, reporter_id, reporter,"
-        " reported_s";
-    static auto Members(auto& mark) {
-        return std::tie(mark.id, mark.kind, mark.camera_id, mark.moment_s, mark.start_s, mark.end_s, mark.text,
-                        mark.state, mark.mount_id, mark.path, mark.demo, mark.reporter.user_id, mark.reporter.name,
-                        mark.reported_s);
-    }
-};
-
 namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::int64_t kSecondsPerDay = 86'400;
-constexpr std::int64_t kMaxFootageSeconds = kMaxMarkSeconds + 2 * kMaxAroundMarkSeconds;
-constexpr std::int64_t kLastMoment = std::numeric_limits<int>::max();  // clients count in 31 bits
 
 bool IsMarkText(std::string_view text) {
     if (text.size() > kMaxMarkTextBytes) {
@@ -151,6 +136,9 @@ std::optional<Mark> Marks::Find(MarkKind kind, int id) {
 }
 
 std::vector<Mark> Marks::List(const MarkFilter& filter) {
+    if (!filter.words.IsEmpty()) {
+        return FindMarksByWords(connection_, filter);
+    }
     const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
     std::vector<Mark> marks;

@@ -17,6 +17,7 @@
 
 #include "standalone/store/events.h"
 #include "standalone/store/store.h"
+#include "standalone/store/text_query.h"
 
 namespace lookhaven::store {
 
@@ -64,7 +65,8 @@ struct Mark {
 // Which marks to read: by default none, since no camera is named.
 struct MarkFilter {
     std::set<int> camera_ids;
-    std::optional<MarkKind> kind;
+    std::optional<MarkKind> kind = std::nullopt;
+    TextQuery words;           // in their texts
     std::int64_t begin_s = 0;  // marks whose footage touches the span from here …
     std::int64_t end_s = std::numeric_limits<std::int64_t>::max();  // … up to, not including, here
     bool newest_first = false;

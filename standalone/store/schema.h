@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The steps that lead from an empty store to this program's schema, the same for both engines.
+// The steps that lead from an empty store to this program's schema, the same for both engines but for what they have of
+// their own to search texts.
 //
 // Invariants    (1) A step that was ever released is never changed; a new need is a new step at the end.
 //               (2) Columns are never null, so that no reader has to check.
@@ -14,6 +15,9 @@ namespace lookhaven::store {
 struct Migration {
     std::string_view purpose;
     std::span<const char* const> statements;
+    // What follows on one engine alone: nothing in it holds a record that is nowhere else.
+    std::span<const char* const> on_sqlite = {};
+    std::span<const char* const> on_postgresql = {};
 };
 
 // Step n leads to version n + 1.

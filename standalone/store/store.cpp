@@ -85,15 +85,18 @@ void PrepareFile(const StoreAddress& address) {
     }
 }
 
-int TakeSteps(soci::session& sql, int version) {
+int TakeSteps(const Connection& connection, soci::session& sql, int version) {
     if (version == 0) {
         sql << "create table schema_version (version integer not null)";
         sql << "insert into schema_version (version) values (0)";
     }
     int steps = 0;
     for (const Migration& migration : Migrations().subspan(static_cast<std::size_t>(version))) {
-        for (const char* statement : migration.statements) {
-            sql << statement;
+        for (const auto& statements :
+             {migration.statements, connection.IsSqlite() ? migration.on_sqlite : migration.on_postgresql}) {
+            for (const char* statement : statements) {
+                sql << statement;
+            }
         }
         ++steps;
     }
@@ -142,7 +145,7 @@ int Store::Migrate(const std::string& url) {
         if (version > SchemaVersion()) {
             ThrowNewer(version);
         }
-        const int steps = version == SchemaVersion() ? 0 : TakeSteps(sql, version);
+        const int steps = version == SchemaVersion() ? 0 : TakeSteps(connection, sql, version);
         SetOnce(sql, "installation", RandomHex(kInstallationIdBytes));
         SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;

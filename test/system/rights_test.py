@@ -52,6 +52,8 @@ POST Group.Set id={group} revision=1 name=x                           E      E  
 POST Group.Remove id={group} revision=1                               E      E     F       F     F    F       F        F      C/N     E
 POST Event.Mark kind=alert camera={camera}                            E      E     F       N     F    F       F        D/N    D/N     E
 Event.List cameralists={camera}: event                                E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Event.List cameralists={camera} text=coffee: event                    E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
+Event.List text=coffee: event                                         E      E     D       O     D    D       D        D      D       E
 Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Next cameralists={camera} time=-1d: event                       E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E

@@ -53,7 +53,10 @@ TEST_F(RecordingsTest, TheDemoRecordsTwoCamerasAndGroupsThemWithinASmallLimit) {
           {"export --from -4d " + zip, 64, "export needs cameras"},
           {"export verify " + (home_ / "lookhaven.db").string(), 65, "no export"},
           {"export verify " + zip + ".mkv", 66, "there is no file"},
-          {"event list --kind pos --camera 2", 0, "2 x Coffee", "pending"}});
+          {"event list --kind pos --camera 2", 0, "2 x Coffee", "pending"},
+          {"event list --text 'COFFEE total'", 0, "2 x [Coffee]", "door"},
+          {"event list --text coffee --kind alert", 0, "no such event"},
+          {"event list --text '\"*\"'", 65, "1 to 16 words"}});
 
     std::string bytes = base::ReadFile(zip);
     bytes[bytes.size() / 2] ^= 1;

@@ -6,6 +6,7 @@
 #include "standalone/store/emaps.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
+#include "standalone/store/marks.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
@@ -37,6 +38,7 @@ class CopyTest : public StoreTest {
                               .path = "1/20240101/AM/a'b.mkv"});
         }
         Events(store_).AddAll(events);
+        Marks(store_).Add(MarkKind::kPos, 1, 100, 0, "2 Tea");
         RecorderLease(store_).Take(0, "elsewhere", 7);
     }
 
@@ -57,6 +59,7 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));
         EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));
+        EXPECT_EQ(Marks(copy).List({.camera_ids = {1}, .words = TextQuery("tea")}).size(), 1U);
         EXPECT_EQ(RecorderLease(copy).Current().holder, "") << "whoever held it records into the other store";
         EXPECT_THAT(copy.Check(), testing::IsEmpty());
         EXPECT_THROW(CopyRecords(store_, copy, CopySessions::kYes), InvalidRecord) << "it has records to lose now";

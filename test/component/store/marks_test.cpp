@@ -15,6 +15,8 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
+const std::vector<std::string> kWords = {"coffee", "tea", "cake", "milk"};
+
 class MarkTest : public RandomRecords {
   protected:
     Events events_{store_};
@@ -96,7 +98,7 @@ TEST_P(MarkTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
         mark.start_s = kDay / 2 + Draw(0, 40) * 600;
         mark.moment_s = mark.start_s + 5;
         mark.end_s = mark.start_s + (Draw(0, 5) == 0 ? 4200 : Draw(0, 600));
-        mark.text = "receipt " + std::to_string(mark.id);
+        mark.text = "receipt " + std::to_string(mark.id) + ' ' + kWords[static_cast<std::size_t>(Draw(0, 3))];
         mark.state = Draw(0, 3) == 0 ? MarkState::kMissed : MarkState::kSaved;
         mark.mount_id = 1;
         return mark;
@@ -119,6 +121,118 @@ TEST_P(MarkTest, MarksAreFoundAsALookAtEveryMarkFindsThem) {
         found += static_cast<int>(expected.size());
     }
     EXPECT_GT(found, 200);
+    // By words, too, and what is removed, by whatever way, is not found by them any more.
+    found = 0;
+    for (int i = 0; i < 100; ++i) {
+        if (const auto at = static_cast<std::size_t>(Draw(0, 199)); i % 3 == 0 && at < all.size()) {
+            EXPECT_TRUE(marks_.Remove(all[at].id));
+            all.erase(all.begin() + static_cast<std::ptrdiff_t>(at));
+        }
+        auto filter = RandomSpan<MarkFilter>(kDay / 2);
+        const std::string word = kWords[static_cast<std::size_t>(Draw(0, 3))];
+        filter.words = TextQuery(word + " receipt");
+        filter.kind = Draw(0, 1) == 0 ? std::nullopt : std::optional(MarkKind::kPos);
+        const auto expected = Naive(all, filter, [&](const Mark& mark) {
+            return mark.text.find(word) != std::string::npos && (!filter.kind || mark.kind == *filter.kind);
+        });
+        ASSERT_EQ(marks_.List(filter), expected) << i;
+        found += static_cast<int>(expected.size());
+    }
+    EXPECT_GT(found, 100);
+    Force("update marks set demo = 1");
+    EXPECT_EQ(events_.RemoveDemo(), static_cast<int>(all.size()));
+    if (GetParam() == Engine::kSqlite) {
+        EXPECT_EQ(Ask("select cast(count(*) as text) from mark_words where mark_words match 'receipt'"), "0");
+    }
+}
+
+TEST_P(MarkTest, WordsAreFoundInTextsAndNothingThatIsTypedHasAnotherMeaning) {
+    const int camera = AddCamera();
+    const std::vector<std::string> texts = {"2 x Coffee  6.40\nTotal  12.80",
+                                            "Somebody at the front-door",
+                                            "TÜR AUF: Hof/Süd (3)",
+                                            "say \"NOT coffee\" AND",
+                                            "Дверь открыта – 07:15",
+                                            "a_b c1 k2 words tags : near 9",
+                                            "it's 80 12",
+                                            "ΟΔΟΣ"};
+    for (const std::string& text : texts) {
+        marks_.Add(MarkKind::kPos, camera, 100, 0, text);
+    }
+    const struct {
+        const char* typed;
+        std::vector<int> found;  // by their places above
+    } rows[] = {
+        {"coffee", {0, 3}},
+        {"COFFEE total", {0}},
+        {"total coffee", {0}},
+        {"coff", {}},
+        {"coff*", {}},
+        {"12.80", {0}},
+        {"12 80", {0, 6}},
+        {"80-12", {6}},
+        {"6.40 Total", {0}},
+        {"front-door", {1}},
+        {"front door", {1}},
+        {"door/front", {}},
+        {"tür", {2}},
+        {"Tur", {}},
+        {"süd hof", {2}},
+        {"ДВЕРЬ", {4}},
+        {"07:15", {4}},
+        {"ΟΔΟΣ", {7}},
+        {"\"coffee\" OR total", {}},
+        {"NOT coffee", {3}},
+        {"coffee AND", {3}},
+        {"say (", {3}},
+        {"words:tags", {5}},
+        {"tags: c1", {5}},
+        {"{words}: near(9)", {5}},
+        {"it's", {6}},
+        {"' & !x", {0}},
+        {":name", {}},
+        {"$1", {}},
+        {"x'; drop table marks; --", {}},
+        {"%", {}},
+        {"c1", {5}},
+    };
+    for (const auto& row : rows) {
+        std::vector<int> found;
+        try {
+            for (const Mark& mark : marks_.List({.camera_ids = {camera}, .words = TextQuery(row.typed)})) {
+                found.push_back(mark.id - 1);
+            }
+        } catch (const InvalidRecord&) {
+            EXPECT_STREQ(row.typed, "%");
+        }
+        EXPECT_EQ(found, row.found) << row.typed;
+    }
+}
+
+TEST(TextQueryTest, MarksWhatWasFoundLineByLine) {
+    using Lines = std::vector<std::vector<std::string>>;
+    const struct {
+        const char* typed;
+        const char* text;
+        Lines lines;
+    } rows[] = {
+        {"coffee 6.40", "2 x Coffee  6.40\nTotal 6.40", {{"2 x ", "Coffee", "  ", "6.40", ""}, {"Total ", "6.40", ""}}},
+        {"6.40", "6 and 40\n6,40!", {{"6 and 40"}, {"", "6,40", "!"}}},
+        {"a.b b.c", "a b c b", {{"", "a b c", " b"}}},
+        {"a.b", "x a\nb y", {{"x ", "a", ""}, {"", "b", " y"}}},
+        {"tür", "Die TÜR türen", {{"Die ", "TÜR", " türen"}}},
+        {"x", "", {}},
+        {"x", "none\n\nhere", {{"none"}, {""}, {"here"}}},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(TextQuery(row.typed).Mark(row.text), row.lines) << row.typed;
+    }
+    const std::string many = "1 2 3 4 5 6 7 8 9 10 11 12 13 14 15 16";
+    EXPECT_EQ(TextQuery(many).Phrases().size(), 16U);
+    for (const std::string& typed : {std::string(), std::string(" \n"), std::string("-*\""), many + " 17", many + ".17",
+                                     std::string("x\xff"), std::string(501, 'x')}) {
+        EXPECT_THROW(TextQuery{typed}, InvalidRecord) << typed;
+    }
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(MarkTest);

@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Opening and setting up a store: from nothing, again, by several at once, and with what this program must not touch.
+#include <algorithm>
 #include <atomic>
 #include <fstream>
 
 #include <sys/stat.h>
 
 #include "standalone/store/events.h"
+#include "standalone/store/marks.h"
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/schema.h"
 #include "standalone/store/settings.h"
@@ -71,6 +73,37 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
     EXPECT_THAT(Users(store).DeniedCameras(1, CameraAccess::kPlayback), ElementsAre(4));
     EXPECT_EQ(RecordingPlans(store).Find(4).mode, RecordMode::kNever);
     EXPECT_EQ(Events(store).NextId(), 1);
+}
+
+TEST_P(EmptyStore, OfAVersionWithoutSearchInTextsFindsThoseOfItsMarks) {
+    int version = 0;
+    for (const Migration& migration : Migrations()) {
+        if (!migration.on_sqlite.empty()) {
+            break;
+        }
+        std::ranges::for_each(migration.statements, [this](const char* statement) { Force(statement); });
+        ++version;
+    }
+    Force("create table schema_version (version integer not null)");
+    Force("insert into schema_version (version) values (" + std::to_string(version) + ")");
+    for (const char* values : {"(1, 2, 5, 300, 290, 310, 'Total 12.80', ", "(2, 1, 5, 200, 190, 210, '', ",
+                               "(3, 2, 5, 100, 90, 110, 'total 7', ", "(4, 2, 6, 100, 90, 110, 'total 8', "}) {
+        Force("insert into marks (id, kind, camera_id, moment_s, start_s, end_s, text, state, mount_id, path, demo)"
+              " values " +
+              std::string(values) + "1, 1, 'x', 0)");
+    }
+    EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - version);
+    Store store = Store::Open(url_);
+    Marks marks(store);
+    const auto found = [&] {
+        std::vector<int> ids;
+        const auto list = marks.List({.camera_ids = {5}, .words = TextQuery("TOTAL"), .newest_first = true});
+        std::ranges::transform(list, std::back_inserter(ids), &Mark::id);
+        return ids;
+    };
+    EXPECT_THAT(found(), ElementsAre(1, 3));
+    EXPECT_TRUE(marks.Remove(1));
+    EXPECT_THAT(found(), ElementsAre(3));
 }
 
 TEST_P(EmptyStore, IsSetUpOnceByMany) {

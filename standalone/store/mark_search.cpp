@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Marks by the words in their texts, by either engine's own full text search.
+//
+// Why so        In SQLite's index the row of a mark is its start and, in the lower 32 bits, its id: so the index itself
+//               gives the newest first, and a span of time is a part of it. Cameras and kinds are words there, too
+//               ("c5", "k1"), so that those of other cameras are not even looked at. PostgreSQL's planner chooses
+//               between its index of words and a walk along the time.
+// See           schema.cpp, which keeps both in step with the marks.
+#include <algorithm>
+#include <string>
+
+#include "standalone/store/connection.h"
+#include "standalone/store/mark_row.h"
+
+namespace lookhaven::store {
+
+namespace {
+
+constexpr std::int64_t kIdMask = 0xFFFF'FFFF;
+
+// What is quoted is words and has no other meaning; a phrase holds no quotes.
+std::string ExpressionOf(const MarkFilter& filter) {
+    std::string cameras;
+    for (const int camera : filter.camera_ids) {
+        cameras += (cameras.empty() ? "\"c" : " OR \"c") + std::to_string(camera) + '"';
+    }
+    std::string expression = "tags : (" + cameras + ")";
+    if (filter.kind) {
+        expression += " AND tags : \"k" + std::to_string(static_cast<int>(*filter.kind)) + '"';
+    }
+    for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
+        expression += " AND words : \"" + phrase.typed + '"';
+    }
+    return expression;
+}
+
+std::string OrderOf(const MarkFilter& filter, const std::string& first, const std::string& second) {
+    const std::string direction = filter.newest_first ? " desc" : "";
+    return " order by " + first + direction + (second.empty() ? "" : ", " + second + direction) +
+           " limit :limit offset :offset";
+}
+
+// Seconds as an index of SQLite has them.
+std::int64_t WithinIndex(std::int64_t time_s) {
+    return std::clamp<std::int64_t>(time_s, 0, kLastMoment);
+}
+
+std::vector<Mark> OnSqlite(soci::session& sql, const MarkFilter& filter, std::int64_t earliest_s) {
+    if (filter.end_s <= 0) {
+        return {};
+    }
+    const std::string expression = ExpressionOf(filter);
+    const std::int64_t first = WithinIndex(earliest_s) << 32;
+    const std::int64_t last = WithinIndex(filter.end_s - 1) << 32 | kIdMask;
+    return FetchAll<Mark>(sql,
+                          std::string("select ") + Mapping<Mark>::kColumns +
+                              " from mark_words cross join marks on marks.id = (mark_words.rowid & :mask)"
+                              " where mark_words match :expression and mark_words.rowid >= :first"
+                              " and mark_words.rowid <= :last and end_s > :begin" +
+                              OrderOf(filter, "mark_words.rowid", ""),
+                          kIdMask, expression, first, last, filter.begin_s, filter.limit, filter.offset);
+}
+
+std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std::int64_t earliest_s) {
+    std::string cameras;
+    for (const int camera : filter.camera_ids) {
+        cameras += (cameras.empty() ? "{" : ",") + std::to_string(camera);
+    }
+    cameras += '}';
+    std::string words;
+    for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
+        words += (words.empty() ? "'" : " & '") + phrase.typed + '\'';
+    }
+    return FetchAll<Mark>(sql,
+                          "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
+                          " and camera_id = any (cast(:cameras as integer[])) and start_s >= :earliest"
+                          " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
+                              OrderOf(filter, "start_s", "id"),
+                          words, cameras, earliest_s, filter.end_s, filter.begin_s,
+                          filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
+}
+
+}  // namespace
+
+std::vector<Mark> FindMarksByWords(Connection& connection, const MarkFilter& filter) {
+    if (filter.camera_ids.empty() || filter.limit <= 0) {
+        return {};
+    }
+    const std::int64_t earliest_s = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
+    return connection.Read([&](soci::session& sql) {
+        return connection.IsSqlite() ? OnSqlite(sql, filter, earliest_s) : OnPostgresql(sql, filter, earliest_s);
+    });
+}
+
+}  // namespace lookhaven::store
