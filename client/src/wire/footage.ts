@@ -36,6 +36,8 @@ export interface Footage extends FootageRef {
   reason: number;
   /** Of a mark, else empty. */
   text: string;
+  /** Where it was found by its text: the lines of that in pieces, of which every second one was looked for. */
+  found?: readonly (readonly string[])[] | undefined;
   /** The account that reported a mark; empty where nobody is named. */
   reporter: string;
   /** There is something to play. */
@@ -75,6 +77,7 @@ export interface RawMark {
   state: "pending" | "saved" | "missed";
   reported_by: string;
   text: string[];
+  found?: string[][];
   archived?: boolean;
 }
 
@@ -98,7 +101,8 @@ export function footageOf(raw: RawEvent, camera: number): Footage {
   };
 }
 
-export function markOf({ id, kind, camera_id, start, stop, time, state, reported_by, text, archived }: RawMark): Footage {
+export function markOf(raw: RawMark): Footage {
+  const { id, kind, camera_id, start, stop, time, state, reported_by, text, found, archived } = raw;
   const unknown = { frameCount: 0, isGrowing: false, reason: 0, note: "", keeper: "" };
   return {
     id,
@@ -108,6 +112,7 @@ export function markOf({ id, kind, camera_id, start, stop, time, state, reported
     stop,
     moment: time,
     text: text.join("\n"),
+    found,
     reporter: reported_by,
     isSaved: state === "saved",
     isKept: archived ?? false,

@@ -73,6 +73,8 @@ const kFarFrame = 1_000_000_000;
 /** As many as the server lists at once. */
 const kMaxMarks = 10_000;
 const kMaxKey = 2 ** 31 - 1;
+/** As many as are found by their texts. */
+export const kMaxFound = 500;
 
 /** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
 export function newStreamKey(): number {
@@ -120,6 +122,17 @@ export class Recordings {
       cameralists: cameras.join(),
     });
     return answer.event.map(markOf);
+  }
+
+  /** Alerts and POS transactions, of one kind or of both, with all of the words in their texts: the newest of all time. */
+  async search(words: string, cameras: readonly number[], kind?: "alert" | "pos"): Promise<Footage[]> {
+    const { event } = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", {
+      text: words,
+      limit: String(kMaxFound),
+      cameralists: cameras.join(),
+      ...(kind ? { kind } : {}),
+    });
+    return event.map(markOf);
   }
 
   /** The kept recordings of the span, with their notes. */

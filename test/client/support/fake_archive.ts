@@ -70,6 +70,12 @@ export class FakeArchive {
           const kept = (camera: number) => this.#overlapping(camera, number("from"), number("to"), false).filter((one) => one.note !== undefined);
           return json({ event: idsOf(query).flatMap((camera) => kept(camera).map((one) => ({ ...rawEvent(one), camera_id: camera }))) });
         }
+        if (query.get("text")) {
+          const words = query.get("text")!;
+          const wanted = (one: Recorded) => one.text?.includes(words) && idsOf(query).includes(one.camera) && query.get("kind") !== (one.kind === "pos" ? "alert" : "pos");
+          const found = (text: string) => text.split("\n").map((line) => line.split(new RegExp(`(${words})`)));
+          return json({ event: this.recorded.filter(wanted).map((one) => ({ ...rawMark(one), found: found(one.text!) })) });
+        }
         return json({ event: idsOf(query).flatMap((camera) => this.#overlapping(camera, number("from"), number("to"), true).map(rawMark)) });
       case "VEXO.Event Get": {
         const kind = query.get("kind") ?? "event";

@@ -32,7 +32,8 @@ export class EventFilter {
   #kinds = new Set<EventKind>(kEventKinds);
   #isKeptOnly = false;
 
-  constructor(changed: () => void) {
+  /** `search` is a part of it that has a place of its own. */
+  constructor(changed: () => void, search: HTMLElement) {
     this.#changed = changed;
     const stored = readStored();
     if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds!.includes(kind)));
@@ -49,7 +50,7 @@ export class EventFilter {
     });
     const cameras = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
     const kindRow = element("div", { class: "chips", role: "group", "aria-label": "Kinds of events" }, ...kinds, this.#keptChip());
-    this.root = element("section", { class: "filter", "aria-label": "Filter" }, cameras, kindRow);
+    this.root = element("section", { class: "filter", "aria-label": "Filter" }, cameras, kindRow, search);
   }
 
   get cameras(): Camera[] {

@@ -26,6 +26,15 @@ export function eventText({ moment, camera }: Footage, nameOf: (camera: number) 
   return `${minuteText(moment * 1000)} · ${nameOf(camera)}`;
 }
 
+/** The lines in which something was found, and it marked. */
+function foundLines(found: readonly (readonly string[])[]): (Node | string)[] {
+  const hits = found.filter((pieces) => pieces.length > 1);
+  return (hits.length > 0 ? hits : found).flatMap((pieces, line) => [
+    ...(line > 0 ? [" · "] : []),
+    ...pieces.map((piece, at) => (at % 2 === 1 ? element("mark", {}, piece) : piece)),
+  ]);
+}
+
 export class EventList {
   readonly root: HTMLElement;
   readonly #onOpen: (footage: Footage) => void;
@@ -143,9 +152,11 @@ export class EventList {
     row.dataset["at"] = String(at);
     row.style.transform = `translateY(${at * rowPx}px)`;
     swatch.dataset["kind"] = kind;
-    setText(time, clockTime(one.moment * 1000));
+    // What was found by its text may be of any day.
+    setText(time, one.found ? minuteText(one.moment * 1000) : clockTime(one.moment * 1000));
     setText(name, this.#nameOf(one.camera));
-    setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
+    if (one.found) text.replaceChildren(...foundLines(one.found));
+    else setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
     setText(side, one.isGrowing ? "recording" : one.isSaved ? duration(one.stop - one.start) : "no footage");
     side.classList.toggle("recording", one.isGrowing);
     button.querySelector<HTMLElement>(".row-kept")!.hidden = !one.isKept;

@@ -13,6 +13,7 @@ import { Calendar } from "./calendar";
 import { EventFilter } from "./event_filter";
 import { EventList } from "./event_list";
 import { listEvents, whyNoEvents } from "./event_listing";
+import { TextSearch } from "./text_search";
 
 const kSettleMs = 150;
 
@@ -29,6 +30,7 @@ export class Overview {
   readonly timeline: Timeline;
   readonly calendar: Calendar;
   readonly #days: RecordedDays;
+  readonly #search: TextSearch;
   readonly #actions: OverviewActions;
   #cameras: readonly Camera[] = [];
   #settling: ReturnType<typeof setTimeout> | undefined;
@@ -37,7 +39,9 @@ export class Overview {
     this.#actions = actions;
     this.cache = new FootageCache(recordings, () => this.#showFootage());
     this.#days = new RecordedDays(recordings, () => this.#showDays());
-    this.filter = new EventFilter(() => actions.filtered());
+    const scope = () => ({ cameras: this.#chosen, kinds: this.filter.kinds });
+    this.#search = new TextSearch(recordings, scope, () => this.#showFootage());
+    this.filter = new EventFilter(() => actions.filtered(), this.#search.root);
     this.list = new EventList(
       (camera) => this.nameOf(camera),
       (footage, widthPx) => recordings.stillAddress(footage, widthPx),
@@ -66,6 +70,7 @@ export class Overview {
   showLanes(onStage: readonly number[]): void {
     this.timeline.setKinds(this.filter.kinds);
     this.timeline.setLanes(this.filter.cameras.map(({ id, name }) => ({ camera: id, name })), onStage);
+    this.#search.refresh();
     // On a phone the timeline may be out of sight, and then tells of no span that has to be loaded.
     this.reload();
   }
@@ -100,6 +105,7 @@ export class Overview {
 
   close(): void {
     clearTimeout(this.#settling);
+    this.#search.close();
     this.timeline.close();
     this.list.close();
   }
@@ -130,6 +136,7 @@ export class Overview {
 
   #showFootage(): void {
     this.timeline.redraw();
+    if (this.#search.isActive) return this.list.show(this.#search.found, this.#search.head, this.#search.note);
     const { startMs, endMs } = this.timeline.scale;
     const span = spanText(startMs, Math.min(endMs, Date.now()));
     if (!this.timeline.showsEvents) return this.list.show([], span, "Show four days or less to list events.");

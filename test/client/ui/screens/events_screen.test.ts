@@ -74,6 +74,29 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.waitForSelector("[data-ref=pos90] button[title$='Reported by till']");
   }, 40_000);
 
+  test("words find what an alert or a receipt says, at any time, marked; a click plays it", async () => {
+    const start = noon - 90 * 86_400;
+    archive.recorded.push({ id: 91, camera: 1, start, stop: start + 30, frames: 300, kind: "alert", text: "Van at gate <i>\n2 Tea" });
+    const page = await opened("#events", 1440, 900);
+    const field = page.getByRole("searchbox");
+    const texts = () => page.locator(".row-text").allTextContents();
+    await field.fill("Tea");
+    await page.locator(".list-head", { hasText: "2 found" }).waitFor();
+    expect(await texts()).toEqual(expect.arrayContaining(["2 Tea <b>", "2 Tea"]));
+    expect(await page.locator(".row-text mark").allTextContents()).toEqual(["Tea", "Tea"]);
+    await page.locator(".chips label", { hasText: "POS" }).click();
+    await page.locator(".list-head", { hasText: "1 found" }).waitFor();
+    await page.locator("[data-ref=alert91] button").click();
+    await state(page, "playing");
+    expect(archive.asked.at(-1)).toBe("alert91 frame 0 to -1 at 1");
+    await field.fill("Milk");
+    await page.locator(".list-note", { hasText: "Nothing found." }).waitFor();
+    await field.fill("");
+    await page.locator(".list-head", { hasText: "event" }).waitFor();
+    await page.evaluate(() => localStorage.clear());
+    archive.recorded.pop();
+  }, 40_000);
+
   test("a pause shows one moment of all cameras, of those too that join then; one that is preempted says so", async () => {
     const page = await opened("#event=14", 1440, 900, 4);
     await state(page, "playing");
