@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The field for words in the texts of alerts and POS transactions, and what was found of the chosen cameras, at any time.
+// The field for words in the texts of alerts and POS transactions, and what was found of the chosen cameras at any time.
 
 import { kEventKinds, type EventKind } from "../../playback/coverage";
 import type { Footage } from "../../wire/footage";
@@ -77,8 +77,8 @@ export class TextSearch {
     const asked = words && JSON.stringify([words, cameras, wanted]);
     if (asked === this.#asked) return;
     this.#asked = asked;
-    const unable = cameras.length === 0 ? "No camera is chosen. Choose some under “Cameras”." : wanted.length === 0 && kNoKind;
-    if (!words || unable) return this.#show([], unable || "");
+    const unable = cameras.length === 0 ? kNoCamera : wanted.length === 0 ? kNoKind : "";
+    if (!words || unable) return this.#show([], unable);
     this.#show([], "Searching…");
     const only = wanted.length === 1 ? wanted[0] : undefined;
     this.#recordings.search(words, cameras, only).then(
@@ -103,6 +103,7 @@ export class TextSearch {
   }
 }
 
+const kNoCamera = "No camera is chosen. Choose some under “Cameras”.";
 const kNoKind = "Only alerts and POS transactions have a text. Choose one of these kinds.";
 
 function noteOf(found: readonly Footage[]): string {
