@@ -27,8 +27,8 @@ struct EmapChange {
     std::optional<emap::MapPicture> picture = {};
 };
 
-// {"id", "name", "hideItemName", "smallItemSize", "picture", "revision"}. The picture is the name of its file, another one
-// for each picture; empty where there is none. The revision grows with every change of the map or its items.
+// {"id", "name", "hideItemName", "smallItemSize", "picture", "revision"}. The picture is the name of its file, another
+// one for each picture; empty where there is none. The revision grows with every change of the map or its items.
 Json::Value EmapRecord(const store::Emap& emap);
 
 // Throws store::NotFound.

@@ -24,8 +24,8 @@ Json::Value GroupRecord(const store::CameraGroup& group);
 
 // These two return the group as it is then.
 store::CameraGroup AddGroup(store::Store& store, const Actor& actor, const store::CameraGroup& group);
-// seen: the record's revision that the actor saw; nothing for whatever it is. edit changes the group, and what it throws
-// ends the change. Added cameras end the sessions of those to whom the group is denied.
+// seen: the record's revision that the actor saw; nothing for whatever it is. edit changes the group, and what it
+// throws ends the change. Added cameras end the sessions of those to whom the group is denied.
 store::CameraGroup SetGroup(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,
                             const std::function<void(store::CameraGroup&)>& edit);
 // Its cameras stay. What is denied of it to an account no longer is: the audit log has to whom it was.

@@ -2,8 +2,8 @@
 //
 // The methods of VEXO.Emap that add, change and remove maps, and the uploads of their pictures.
 //
-// Why so        A picture is the whole body of its request, so that none of it is parsed here; its parameters are in the
-//               address. It is the only body larger than 1 MiB, and only a manager's is read at all.
+// Why so        A picture is the whole body of its request, so that none of it is parsed here; its parameters are in
+//               the address. It is the only body larger than 1 MiB, and only a manager's is read at all.
 #pragma once
 
 #include <string>

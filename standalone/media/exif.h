@@ -8,8 +8,8 @@
 
 namespace lookhaven::media {
 
-// As EXIF counts: 1 upright, 2 to 8 mirrored or turned, 1 where the file does not say. Reads the segments in front of the
-// picture only, and never beyond the bytes.
+// As EXIF counts: 1 upright, 2 to 8 mirrored or turned, 1 where the file does not say. Reads the segments in front of
+// the picture only, and never beyond the bytes.
 int OrientationOf(std::span<const std::uint8_t> jpeg);
 
 }  // namespace lookhaven::media

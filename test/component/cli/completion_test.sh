@@ -26,9 +26,9 @@ Offers "camera" cam
 Offers "remove" camera rem
 Offers "remove" --home /nowhere camera rem
 Offers "remove" camera --json rem
-Offers "--record" camera set 1 --record
-Offers "never always alarm" camera set 1 --record ""
-Offers "always alarm" camera set 1 --record a
+Offers "--record --record-profile" camera set 1 --record
+Offers "always never schedule" camera set 1 --record ""
+Offers "always" camera set 1 --record a
 Offers "--help --home --json" version --
 Offers "" camera set 1 --name ""  # any text
 Offers "" camera frobnicate
