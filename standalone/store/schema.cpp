@@ -214,8 +214,8 @@ constexpr const char* kMarkWordsOnSqlite[] = {
 };
 
 // Functions, so that index and searches have one form of the words. What stands between words becomes a space, since
-// the parser would take "door/yard" for a path and "12.80" for one number. A database whose locale is C knows small letters
-// and capitals of ASCII alone, so it is told the letters of all scripts, where its server has them.
+// the parser would take "door/yard" for a path and "12.80" for one number. A database whose locale is C knows
+// small letters and capitals of ASCII alone, so it is told the letters of all scripts, where its server has them.
 constexpr const char* kMarkWordsOnPostgresql[] = {
     R"(do $do$
 declare letters text := case when exists (select 1 from pg_collation where collname = 'und-x-icu')
