@@ -84,7 +84,7 @@ TEST(Host, SurvivesMalformedRequests) {
     const HostUnderTest host({"--read-seconds", "0.5"});
     const std::string long_head = ScgiBytes({{"LONG", std::string(9000, 'x')}});
     for (const std::string& bytes : {std::string("-5:"), std::string("GET / HTTP/1.1\r\n\r\n"), long_head,
-                                     ScgiBytes({}, std::string(2 << 20, 'x')), ScgiBytes({}) + "more"}) {
+                                     ScgiBytes({}, std::string(21 << 20, 'x')), ScgiBytes({}) + "more"}) {
         const Answer answer = host.Exchange(bytes);
         EXPECT_EQ(answer.status, 400) << bytes.substr(0, 20);
         EXPECT_EQ(answer.Json()["error"]["code"], 400);
