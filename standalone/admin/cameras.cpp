@@ -83,7 +83,6 @@ void WriteRest(store::Store& store, const CameraSetup& setup) {
 // For the audit log: that the password is another one shows, but nothing of it.
 Json::Value AuditJson(const CameraSetup& setup, bool has_new_password) {
     Json::Value json = ToJson(setup);
-    json.removeMember("revision");
     if (has_new_password) {
         json["password"] = "changed";
     }

@@ -25,6 +25,13 @@ std::string AuditText(const Json::Value& record) {
     return text.size() <= kMaxRecordBytes ? text : R"({"tooLarge":)" + std::to_string(text.size()) + "}";
 }
 
+Json::Value WithoutRevision(Json::Value record) {
+    if (record.isObject()) {
+        record.removeMember("revision");
+    }
+    return record;
+}
+
 }  // namespace
 
 void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
@@ -32,9 +39,11 @@ void Apply(store::Store& store, const Actor& actor, const std::function<Change()
         store::Users(store).Lock();  // who may make this change may do so until it is made
         RequireManager(store, actor);
         const Change change = make();
-        if (change.before != change.after) {
+        const Json::Value before = WithoutRevision(change.before);
+        const Json::Value after = WithoutRevision(change.after);
+        if (before != after) {
             store::AuditLog(store).Add({0, base::WallSeconds(), actor.user_id, actor.name, actor.address, change.action,
-                                        change.object, AuditText(change.before), AuditText(change.after)});
+                                        change.object, AuditText(before), AuditText(after)});
         }
     });
 }
@@ -44,9 +53,7 @@ std::string Named(const std::string& name, int id) {
 }
 
 std::int64_t RevisionOf(const Json::Value& record) {
-    Json::Value content = record;
-    content.removeMember("revision");
-    const std::string digits = store::Digest(ToText(content)).substr(0, kRevisionDigits);
+    const std::string digits = store::Digest(ToText(WithoutRevision(record))).substr(0, kRevisionDigits);
     std::int64_t revision = 0;
     std::from_chars(digits.data(), digits.data() + digits.size(), revision, 16);
     return revision;

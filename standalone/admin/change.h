@@ -18,7 +18,7 @@
 
 namespace lookhaven::admin {
 
-// What a change did, for the audit log. Neither record holds a secret.
+// What a change did, for the audit log. Neither record holds a secret; a revision is left out.
 struct Change {
     std::string action;       // "camera.add"
     std::string object;       // as Named gives it

@@ -11,13 +11,6 @@ namespace {
 using store::Emap;
 using store::Emaps;
 
-// The revision is no part of what was changed.
-Json::Value Audited(const Emap& emap) {
-    Json::Value record = EmapRecord(emap);
-    record.removeMember("revision");
-    return record;
-}
-
 }  // namespace
 
 Json::Value EmapRecord(const Emap& emap) {
@@ -47,7 +40,7 @@ Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
                                          .small_items = change.small_items.value_or(false)});
         emap::Pictures(store, home).Put(id, change.picture.value().File());
         emap = RequireEmap(store, id);
-        return Change{"emap.add", Named(emap.name, id), {}, Audited(emap)};
+        return Change{"emap.add", Named(emap.name, id), {}, EmapRecord(emap)};
     });
     return emap;
 }
@@ -67,7 +60,7 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
             emap::Pictures(store, home).Put(id, change.picture->File());
         }
         emap = RequireEmap(store, id);
-        return Change{"emap.set", Named(emap.name, id), Audited(before), Audited(emap)};
+        return Change{"emap.set", Named(emap.name, id), EmapRecord(before), EmapRecord(emap)};
     });
     return emap;
 }
@@ -78,7 +71,7 @@ void RemoveEmap(store::Store& store, const Actor& actor, const std::filesystem::
         const Emap emap = RequireEmap(store, id);
         RequireCurrent(EmapRecord(emap), seen);
         Emaps(store).Remove(id);
-        return Change{"emap.remove", Named(emap.name, id), Audited(emap), {}};
+        return Change{"emap.remove", Named(emap.name, id), EmapRecord(emap), {}};
     });
     emap::Pictures(store, home).Sweep();
 }

@@ -21,12 +21,6 @@ CameraGroup RequireGroup(Groups& groups, int id) {
     return *std::move(group);
 }
 
-Json::Value Audited(const CameraGroup& group) {
-    Json::Value record = GroupRecord(group);
-    record.removeMember("revision");
-    return record;
-}
-
 }  // namespace
 
 Json::Value GroupRecord(const CameraGroup& group) {
@@ -45,7 +39,7 @@ CameraGroup AddGroup(store::Store& store, const Actor& actor, const CameraGroup&
     CameraGroup added = group;
     Apply(store, actor, [&] {
         added.id = Groups(store).Add(group);
-        return Change{"group.add", Named(added.name, added.id), {}, Audited(added)};
+        return Change{"group.add", Named(added.name, added.id), {}, GroupRecord(added)};
     });
     return added;
 }
@@ -60,7 +54,7 @@ CameraGroup SetGroup(store::Store& store, const Actor& actor, int id, std::optio
         group = before;
         edit(group);
         groups.Update(group);
-        return Change{"group.set", Named(group.name, id), Audited(before), Audited(group)};
+        return Change{"group.set", Named(group.name, id), GroupRecord(before), GroupRecord(group)};
     });
     return group;
 }
@@ -70,7 +64,7 @@ void RemoveGroup(store::Store& store, const Actor& actor, int id, std::optional<
         Groups groups(store);
         const CameraGroup group = RequireGroup(groups, id);
         RequireCurrent(GroupRecord(group), seen);
-        Json::Value before = Audited(group);
+        Json::Value before = GroupRecord(group);
         for (const std::string& account : DeniedTo(store, id)) {
             before["deniedTo"].append(account);
         }

@@ -38,12 +38,6 @@ void RequireNoLoss(store::Store& store, const store::Mount& before, const store:
     }
 }
 
-Json::Value Audited(const store::Mount& mount) {
-    Json::Value record = MountRecord(mount);
-    record.removeMember("revision");
-    return record;
-}
-
 }  // namespace
 
 void MountChange::ApplyTo(store::Mount& mount) const {
@@ -81,7 +75,7 @@ store::Mount AddMount(store::Store& store, const Actor& actor, const MountChange
     Apply(store, actor, [&] {
         mount = RequireMount(store, store::Mounts(store).Add(mount));
         MarkFolder(store, mount);
-        return Change{"mount.add", Named(mount.name, mount.id), {}, Audited(mount)};
+        return Change{"mount.add", Named(mount.name, mount.id), {}, MountRecord(mount)};
     });
     ReserveNumbers(store, mount);
     return mount;
@@ -110,7 +104,7 @@ store::Mount SetMount(store::Store& store, const Actor& actor, int id, std::opti
         if (is_marked) {
             MarkFolder(store, mount);
         }
-        return Change{"mount.set", Named(mount.name, id), Audited(before), Audited(mount)};
+        return Change{"mount.set", Named(mount.name, id), MountRecord(before), MountRecord(mount)};
     });
     if (is_marked) {
         ReserveNumbers(store, mount);
@@ -131,7 +125,7 @@ void RemoveMount(store::Store& store, const Actor& actor, int id, std::optional<
             const store::Mount mount = RequireMount(store, id);
             RequireCurrent(MountRecord(mount), seen);
             mounts.Remove(id, false);
-            return Change{"mount.remove", Named(mount.name, id), Audited(mount), {}};
+            return Change{"mount.remove", Named(mount.name, id), MountRecord(mount), {}};
         });
     } catch (const store::InvalidRecord& error) {
         throw StillNeeded(error.what());

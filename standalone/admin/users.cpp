@@ -108,7 +108,6 @@ Json::Value Make(store::Store& store, const User& before, const UserChange& chan
 
 // A password is told of, not told.
 Json::Value Audited(Json::Value record, const UserChange& change) {
-    record.removeMember("revision");
     if (change.password) {
         record["password"] = "new";
     }
@@ -125,7 +124,7 @@ Json::Value AddUser(store::Store& store, const Actor& actor, const std::string& 
         RequireMayManage(users, actor, privilege);
         const User user = users.Add(name, change.password.value(), privilege);
         record = Make(store, user, {{}, privilege, change.may_mark, change.denials});
-        return Change{"user.add", Named(user.name, user.id), {}, Audited(record, {})};
+        return Change{"user.add", Named(user.name, user.id), {}, record};
     });
     return record;
 }
@@ -144,7 +143,7 @@ Json::Value SetUser(store::Store& store, const Actor& actor, int id, std::option
             RequireAnotherOwner(users, user);
         }
         record = Make(store, user, change);
-        return Change{"user.set", Named(user.name, id), Audited(before, {}), Audited(record, change)};
+        return Change{"user.set", Named(user.name, id), before, Audited(record, change)};
     });
     return record;
 }
@@ -161,7 +160,7 @@ void RemoveUser(store::Store& store, const Actor& actor, int id, std::optional<s
             throw StillNeeded("nobody removes the own account: another manager must");
         }
         users.Remove(id);
-        return Change{"user.remove", Named(user.name, id), Audited(before, {}), {}};
+        return Change{"user.remove", Named(user.name, id), before, {}};
     });
 }
 
