@@ -2,7 +2,6 @@
 //
 // Recordings of every format, as ffprobe sees them; killed at any point, on a full disk, cut, without an index.
 #include <atomic>
-#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <random>
@@ -12,31 +11,15 @@
 #include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <sys/resource.h>
-#include <sys/syscall.h>
 #include <unistd.h>
 
 #include "standalone/archive/recording_reader.h"
 #include "standalone/archive/repair.h"
 #include "standalone/base/clock.h"
+#include "test/support/failing_sync.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/process.h"
-
-namespace {
-
-int failing_syncs = 0;
-
-}  // namespace
-
-// Stands in front of the C library's. Like Linux, it reports a lost write once: the next call succeeds.
-extern "C" int fdatasync(int descriptor) {
-    if (failing_syncs > 0) {
-        --failing_syncs;
-        errno = EIO;
-        return -1;
-    }
-    return static_cast<int>(::syscall(SYS_fdatasync, descriptor));
-}
 
 namespace lookhaven::test {
 namespace {
@@ -269,9 +252,9 @@ TEST(RecordingWriter, FramesOfAFailedSyncAreNeverIndexed) {
         }
         writer.Flush();
         writer.Write(clip.At(static_cast<std::size_t>(flushed)));
-        failing_syncs = 1;
+        g_failing_syncs = 1;
         EXPECT_THROW(writer.Flush(), WriteError);
-        ASSERT_EQ(failing_syncs, 0) << "nothing was synced";
+        ASSERT_EQ(g_failing_syncs, 0) << "nothing was synced";
         writer.Close();
         EXPECT_EQ(writer.FrameCount(), flushed);
         ASSERT_EQ(std::filesystem::exists(path), flushed > 0);

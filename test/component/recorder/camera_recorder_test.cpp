@@ -10,6 +10,7 @@
 #include "standalone/archive/recording_log.h"
 #include "standalone/archive/recording_reader.h"
 #include "standalone/maintenance/mount_folder.h"
+#include "test/support/failing_sync.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/wait.h"
@@ -109,7 +110,8 @@ TEST_F(CameraRecorderTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinu
     OpenStore();
     Pass(2.48);
     const int event = recorder_.OpenEvent();
-    fs::rename(MountPath(1), folder_ / "away");
+    ASSERT_TRUE(recorder_.Flush(event));
+    test::g_failing_syncs = std::numeric_limits<int>::max();
     recorder_.Close();
     const auto is_open_in_store = [&] {
         rows_.Refresh(4);
@@ -122,7 +124,7 @@ TEST_F(CameraRecorderTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinu
     ASSERT_TRUE(is_open_in_store()) << "the disk may come back";
     Pass(10, false);
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return !is_open_in_store(); }));
-    fs::rename(folder_ / "away", MountPath(1));
+    test::g_failing_syncs = 0;
     Pass(3);
     EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
     EXPECT_NE(recorder_.OpenEvent(), event);
