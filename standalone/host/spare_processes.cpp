@@ -28,42 +28,47 @@ constexpr char kReady = 'r';
 // A head, an awaited body, or one chunk of a large one.
 constexpr std::size_t kMaxRequestBytes = 64 * 1024;
 
-struct ControlMessage {
-    alignas(cmsghdr) std::array<char, CMSG_SPACE(sizeof(int))> bytes{};
+// One message: the slot's number, the request, and the connection beside it.
+class RequestMessage {
+  public:
+    // Borrows both.
+    RequestMessage(std::uint32_t& slot, std::string& request)
+        : pieces_{{{&slot, sizeof slot}, {request.data(), request.size()}}} {
+        message_.msg_iov = pieces_.data();
+        message_.msg_iovlen = pieces_.size();
+        message_.msg_control = control_.data();
+        message_.msg_controllen = control_.size();
+    }
+    RequestMessage(const RequestMessage&) = delete;
+    RequestMessage& operator=(const RequestMessage&) = delete;
+
+    msghdr& Header() { return message_; }
+
+  private:
+    std::array<iovec, 2> pieces_;
+    alignas(cmsghdr) std::array<char, CMSG_SPACE(sizeof(int))> control_{};
+    msghdr message_{};
 };
 
-// One message: the slot's number, the request, and the connection beside it.
 bool SendRequest(int channel, std::uint32_t slot, std::string& request, int connection) {
-    std::array<iovec, 2> pieces{{{&slot, sizeof slot}, {request.data(), request.size()}}};
-    ControlMessage control;
-    msghdr message{};
-    message.msg_iov = pieces.data();
-    message.msg_iovlen = pieces.size();
-    message.msg_control = control.bytes.data();
-    message.msg_controllen = control.bytes.size();
-    cmsghdr* rights = CMSG_FIRSTHDR(&message);
+    RequestMessage message(slot, request);
+    cmsghdr* rights = CMSG_FIRSTHDR(&message.Header());
     rights->cmsg_level = SOL_SOCKET;
     rights->cmsg_type = SCM_RIGHTS;
     rights->cmsg_len = CMSG_LEN(sizeof connection);
     std::memcpy(CMSG_DATA(rights), &connection, sizeof connection);
-    return ::sendmsg(channel, &message, MSG_DONTWAIT | MSG_NOSIGNAL) > 0;
+    return ::sendmsg(channel, &message.Header(), MSG_DONTWAIT | MSG_NOSIGNAL) > 0;
 }
 
 // The connection; -1 when the host wants this process no more.
 int ReceiveRequest(int channel, std::uint32_t& slot, std::string& request) {
     request.resize(kMaxRequestBytes);
-    std::array<iovec, 2> pieces{{{&slot, sizeof slot}, {request.data(), request.size()}}};
-    ControlMessage control;
-    msghdr message{};
-    message.msg_iov = pieces.data();
-    message.msg_iovlen = pieces.size();
-    message.msg_control = control.bytes.data();
-    message.msg_controllen = control.bytes.size();
+    RequestMessage message(slot, request);
     ssize_t got = 0;
     do {
-        got = ::recvmsg(channel, &message, MSG_CMSG_CLOEXEC);
+        got = ::recvmsg(channel, &message.Header(), MSG_CMSG_CLOEXEC);
     } while (got < 0 && errno == EINTR);
-    const cmsghdr* rights = got > 0 ? CMSG_FIRSTHDR(&message) : nullptr;
+    const cmsghdr* rights = got > 0 ? CMSG_FIRSTHDR(&message.Header()) : nullptr;
     if (rights == nullptr || static_cast<std::size_t>(got) < sizeof slot) {
         return -1;
     }
@@ -87,18 +92,20 @@ const Child* SpareProcesses::Start() {
     }
     base::FileDescriptor own(ends[0]);
     const base::FileDescriptor other(ends[1]);
-    std::optional<Child> child =
-        StartChild("a spare process", [this, channel = other.Get()] { WaitForRequest(work_.leave_host(channel)); });
+    // Before the fork, so that no list of processes shows one that waits as one that serves a request.
+    std::array<char, 16> own_name{};
+    ::prctl(PR_GET_NAME, own_name.data());
+    ::prctl(PR_SET_NAME, kSpareName);
+    std::optional<Child> child = StartChild(
+        "a spare process", [&, channel = other.Get()] { WaitForRequest(work_.leave_host(channel), own_name.data()); });
+    ::prctl(PR_SET_NAME, own_name.data());
     if (!child) {
         return nullptr;
     }
     return &spares_.emplace_back(Spare{*std::move(child), std::move(own)}).child;
 }
 
-void SpareProcesses::WaitForRequest(int channel) const {
-    std::array<char, 16> name{};
-    ::prctl(PR_GET_NAME, name.data());
-    ::prctl(PR_SET_NAME, kSpareName);
+void SpareProcesses::WaitForRequest(int channel, const char* name) const {
     work_.prepare();
     if (::send(channel, &kReady, 1, MSG_NOSIGNAL) != 1) {
         return;
@@ -112,7 +119,7 @@ void SpareProcesses::WaitForRequest(int channel) const {
     ::dup2(connection, STDOUT_FILENO);
     ::close(connection);
     ::close(channel);
-    ::prctl(PR_SET_NAME, name.data());
+    ::prctl(PR_SET_NAME, name);
     ScgiParser parser;
     const ScgiParser::State state = parser.Feed(text);
     http::Wipe(text);

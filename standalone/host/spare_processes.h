@@ -57,7 +57,8 @@ class SpareProcesses {
         bool is_ready = false;
     };
 
-    void WaitForRequest(int channel) const;
+    // name: of a process that serves a request.
+    void WaitForRequest(int channel, const char* name) const;
     static void End(const Spare& spare);
 
     const std::size_t count_;

@@ -60,6 +60,14 @@ def descendants(pid):
     return found
 
 
+def process_name(pid):
+    """Empty once it is gone."""
+    try:
+        return pathlib.Path(f"/proc/{pid}/comm").read_text().strip()
+    except OSError:
+        return ""
+
+
 def program(pid):
     """The base name of a process's program; empty once it is gone, a zombie included."""
     with contextlib.suppress(OSError):
@@ -184,8 +192,8 @@ class Installation:
         )
 
     def requests(self):
-        """Process ids below the web API host, its watcher included."""
-        return descendants(self.part("webapi"))
+        """Process ids below the web API host, its watcher included, but not those that wait for a request."""
+        return {pid for pid in descendants(self.part("webapi")) if process_name(pid) != "webapi-spare"}
 
     def cli(self, *arguments, text="", timeout=60):
         done = subprocess.run(
