@@ -215,7 +215,8 @@ constexpr const char* kMarkWordsOnSqlite[] = {
 
 // Functions, so that index and searches have one form of the words. What stands between words becomes a space, since
 // the parser would take "door/yard" for a path and "12.80" for one number. A database whose locale is C knows
-// small letters and capitals of ASCII alone, so it is told the letters of all scripts, where its server has them.
+// small letters and capitals of ASCII alone, so it is told the letters of all scripts, where its server has them. The
+// index's function calls functions of the server alone: maintenance and restoring look nothing up in our schema.
 constexpr const char* kMarkWordsOnPostgresql[] = {
     R"(do $do$
 declare letters text := case when exists (select 1 from pg_collation where collname = 'und-x-icu')
@@ -224,7 +225,7 @@ begin
     execute 'create function mark_small(text text) returns text language sql immutable parallel safe as '
         || '$small$ select lower(text' || letters || ') $small$';
     execute 'create function mark_words(text text) returns tsvector language sql immutable parallel safe as '
-        || '$words$ select to_tsvector(''pg_catalog.simple'', regexp_replace(mark_small(text)' || letters
+        || '$words$ select to_tsvector(''pg_catalog.simple'', regexp_replace(lower(text' || letters || ')' || letters
         || ', ''[^[:alnum:]]+'', '' '', ''g'')) $words$';
 end $do$)",
     "create index marks_by_words on marks using gin (mark_words(text))",

@@ -18,6 +18,7 @@ namespace {
 
 constexpr std::size_t kMaxTypedBytes = 500;
 constexpr std::size_t kMaxWords = 16;
+constexpr std::size_t kMaxMarkedLines = 100;  // as lists of many texts can be shown
 
 // Of this locale every system has the letters of all scripts.
 locale_t Unicode() {
@@ -128,12 +129,16 @@ TextQuery::TextQuery(std::string_view typed) {
 std::vector<std::vector<std::string>> TextQuery::Mark(std::string_view text) const {
     const std::vector<Span> hits = HitsOf(phrases_, WordsOf(text).value_or(std::vector<Word>{}));
     std::vector<std::vector<std::string>> lines;
-    for (std::size_t begin = 0; begin < text.size();) {
+    auto next = hits.begin();
+    for (std::size_t begin = 0; begin < text.size() && lines.size() < kMaxMarkedLines;) {
         const std::size_t end = std::min(text.find('\n', begin), text.size());
         std::vector<std::string>& pieces = lines.emplace_back();
         std::size_t at = begin;
-        for (const Span& hit : hits) {
-            const Span within{std::max(hit.begin, begin), std::min(hit.end, end)};
+        while (next != hits.end() && next->end <= begin) {
+            ++next;
+        }
+        for (auto hit = next; hit != hits.end() && hit->begin < end; ++hit) {
+            const Span within{std::max(hit->begin, begin), std::min(hit->end, end)};
             if (within.begin < within.end) {
                 pieces.emplace_back(text.substr(at, within.begin - at));
                 pieces.emplace_back(text.substr(within.begin, within.end - within.begin));
