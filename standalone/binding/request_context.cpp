@@ -47,8 +47,9 @@ RequestContext& RequestContext::Current() {
 void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
     const std::optional<StoreFile> file = FileOf(installation.StoreUrl());
     auto records = std::make_unique<store::Store>(store::Store::Open(installation.StoreUrl()));
-    store::Users(*records).List();
-    store::Cameras(*records).List();
+    // Of nobody: what is read stays in this process's memory.
+    store::Users(*records).Find(0);
+    store::Cameras(*records).Find(0);
     // A connection to a server may be gone when it is needed.
     if (file) {
         records_ = std::move(records);

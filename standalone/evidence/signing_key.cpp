@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/evidence/signing_key.h"
 
+#include <cstring>
 #include <stdexcept>
 #include <string>
 
@@ -33,7 +34,9 @@ void RequireSigningKey(const fs::path& key_file) {
         }
         const base::FileDescriptor lock = base::LockFile(folder / "lock");
         if (!fs::exists(key_file)) {
-            base::WriteFileAtomically(key_file, LoadSignatureLibrary().MakeKey(), 0600);
+            std::string key = LoadSignatureLibrary().MakeKey();
+            base::WriteFileAtomically(key_file, key, 0600);
+            ::explicit_bzero(key.data(), key.size());  // this process reads footage next
         }
     }
     base::OpenFile(key_file, O_RDONLY);
