@@ -3,8 +3,8 @@
 // Starts the web client. Where things are:
 //
 //   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
-//              groups, emap_setup, people, mounts, audit), the parts of an endless answer (multipart), files that are sent
-//              (upload), requests that end in time (deadline) and take turns (semaphore)
+//              groups, emap_setup, accounts, mounts, audit), the parts of an endless answer (multipart), files that are
+//              sent (upload), requests that end in time (deadline) and take turns (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
@@ -48,10 +48,10 @@ import "./style/timeline.css";
 import "./style/map.css";
 import "./style/map_editor.css";
 import "./style/form.css";
-import "./style/account.css";
+import "./style/account_menu.css";
 import "./style/settings.css";
 import "./style/cameras.css";
-import "./style/people.css";
+import "./style/accounts.css";
 import "./style/emaps.css";
 import "./style/storage.css";
 import "./style/audit.css";

@@ -41,8 +41,8 @@ await visit(async (page, complaints) => {
   await page.getByRole("button", { name: "Save", exact: true }).click();
   await page.getByText("The camera is saved.").waitFor();
   await page.evaluate(() => void (location.hash = "#settings=groups"));
-  await page.locator(".person-row", { hasText: "Deliveries" }).waitFor();
-  await report("group", { row: await page.locator(".person-row", { hasText: "Deliveries" }).innerText() });
+  await page.locator(".record-row", { hasText: "Deliveries" }).waitFor();
+  await report("group", { row: await page.locator(".record-row", { hasText: "Deliveries" }).innerText() });
 
   const dialog = (name) => page.getByRole("dialog", { name });
   const row = (name) => page.locator(".emap-row", { hasText: name });
@@ -85,9 +85,9 @@ await visit(async (page, complaints) => {
   await page.getByRole("button", { name: "Add the account" }).click();
   await page.getByLabel("Your own password").fill(password);
   await page.getByRole("button", { name: "Add", exact: true }).click();
-  await page.locator(".person-row", { hasText: "night" }).waitFor();
+  await page.locator(".record-row", { hasText: "night" }).waitFor();
   await page.screenshot({ path: `${folder}/accounts.png` });
-  await report("account", { word: kWord, row: await page.locator(".person-row", { hasText: "night" }).innerText() });
+  await report("account", { word: kWord, row: await page.locator(".record-row", { hasText: "night" }).innerText() });
 
   await page.evaluate(() => void (location.hash = "#settings=audit"));
   await page.locator(".audit-entry").first().waitFor();

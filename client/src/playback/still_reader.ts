@@ -12,7 +12,7 @@ import { readFrames, type RecordedFrame } from "./frame_stream";
 
 export class StillReader {
   readonly #recordings: Recordings;
-  readonly #kept = new Map<number, RecordedFrame>();
+  readonly #cached = new Map<number, RecordedFrame>();
 
   constructor(recordings: Recordings) {
     this.#recordings = recordings;
@@ -20,7 +20,7 @@ export class StillReader {
 
   /** Call it before frames of another recording. */
   forget(): void {
-    this.#kept.clear();
+    this.#cached.clear();
   }
 
   /** Hands the frame to `show`. Rejects with a ServerError when it does not come; resolves early when `signal` is aborted. */
@@ -31,13 +31,13 @@ export class StillReader {
     signal: AbortSignal,
     maxSilenceMs: number,
   ): Promise<void> {
-    const kept = this.#kept.get(start.index);
-    if (kept) return show(kept);
-    this.#kept.clear();
+    const cached = this.#cached.get(start.index);
+    if (cached) return show(cached);
+    this.#cached.clear();
     let isShown = false;
     const open = (until: AbortSignal) => this.#recordings.play(footage, start, "one", 1, newStreamKey(), until);
     const take = async (frame: RecordedFrame) => {
-      if (start.from !== undefined) this.#kept.set(frame.index, frame);
+      if (start.from !== undefined) this.#cached.set(frame.index, frame);
       if (frame.index < start.index) return true;
       await show(frame);
       isShown = true;

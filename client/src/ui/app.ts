@@ -9,7 +9,7 @@ import { loginScreen } from "./screens/login_screen";
 import { MapsScreen } from "./screens/maps_screen";
 import { followRoute, leaveSetup, openScreen, settingsAddress, setupToken } from "./screens/route";
 import type { Screen } from "./screens/screen";
-import type { Kept } from "./screens/session";
+import type { RememberedState } from "./screens/session";
 import { SettingsScreen } from "./screens/settings_screen";
 import { noAccountScreen, setupScreen } from "./screens/setup_screen";
 import { WallScreen } from "./screens/wall_screen";
@@ -18,7 +18,7 @@ import { element } from "./widgets/dom";
 import { hideNotice } from "./widgets/notice";
 import { titleScreen } from "./widgets/title";
 
-const keptFor = (userId: number, isSettingUp = false): Kept => {
+const rememberedFor = (userId: number, isSettingUp = false): RememberedState => {
   return { userId, absentCameras: new AbsentCameras(), mapDraft: null, settingsDraft: null, isSettingUp };
 };
 const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen, settings: SettingsScreen };
@@ -28,7 +28,7 @@ export class App {
   readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
   #account: Account | null = null;
   /** Of the account that was the last to log in. */
-  #kept = keptFor(0);
+  #remembered = rememberedFor(0);
   /** Null at the log-in. */
   #screen: Screen | null = null;
   /** As long as the server has none. */
@@ -74,10 +74,10 @@ export class App {
 
   /** What was typed stays where a newer address is opened. */
   #showSetup(): void {
-    if (this.#root.querySelector(setupToken() === null ? ".entrance-form" : "form.entrance-form")) return;
+    if (this.#root.querySelector(setupToken() === null ? ".setup-form" : "form.setup-form")) return;
     titleScreen("Set up");
     const made = (account: Account) => {
-      this.#kept = keptFor(account.user_id, true);
+      this.#remembered = rememberedFor(account.user_id, true);
       leaveSetup(settingsAddress("cameras", "new"));
       this.#showScreens(account);
     };
@@ -95,7 +95,7 @@ export class App {
   #showScreens(account: Account): void {
     this.#isWithoutAccounts = false;
     this.#account = account;
-    if (this.#kept.userId !== account.user_id) this.#kept = keptFor(account.user_id);
+    if (this.#remembered.userId !== account.user_id) this.#remembered = rememberedFor(account.user_id);
     this.#followRoute();
   }
 
@@ -110,7 +110,7 @@ export class App {
     const session = {
       server: this.#server,
       account: this.#account,
-      kept: this.#kept,
+      remembered: this.#remembered,
       onLogOut: () => this.#showLogin(""),
     };
     this.#screen = new kScreens[name](session);

@@ -6,7 +6,7 @@ import type { CameraRecord } from "../../../client/src/wire/camera_setup";
 import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { MountRecord } from "../../../client/src/wire/mounts";
-import type { UserRecord } from "../../../client/src/wire/people";
+import type { UserRecord } from "../../../client/src/wire/accounts";
 
 type Request = Record<string, never> & { id: number };
 type Answer = { status: number; success: boolean; data?: unknown; error?: unknown };

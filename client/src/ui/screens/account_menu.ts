@@ -2,7 +2,7 @@
 //
 // What users do with their own account: change its password, log out. Opened from the bar of each screen.
 
-import { People } from "../../wire/people";
+import { Accounts } from "../../wire/accounts";
 import { ServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element } from "../widgets/dom";
@@ -81,7 +81,7 @@ export class AccountMenu {
       attempt: async () => {
         const problem = password.value ? passwordProblem(wanted.value, again.value) : "Please enter your current password.";
         if (problem) return problem;
-        await new People(this.#session.server).changePassword(password.value, wanted.value);
+        await new Accounts(this.#session.server).changePassword(password.value, wanted.value);
         return undefined;
       },
     });

@@ -8,13 +8,13 @@ import { icon } from "../widgets/icons";
 
 /** `hint` says why the user is here again, if there is a reason. */
 export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => void): HTMLElement {
-  const account = entranceField("account", "Account", {
+  const account = credentialField("account", "Account", {
     type: "text",
     autocomplete: "username",
     autocapitalize: "none",
     spellcheck: "false",
   });
-  const password = entranceField("password", "Password", { type: "password", autocomplete: "current-password" });
+  const password = credentialField("password", "Password", { type: "password", autocomplete: "current-password" });
   const submit = element("button", { type: "submit", class: "button primary" }, "Log in");
   const message = element("p", { class: "login-message", role: "alert" }, hint);
   const form = element(
@@ -53,7 +53,7 @@ export function brand(): HTMLElement {
 }
 
 /** A field with its label, as all have that can be seen without a session. */
-export function entranceField(name: string, label: string, attributes: Record<string, string>) {
+export function credentialField(name: string, label: string, attributes: Record<string, string>) {
   const input = element("input", { class: "input", id: name, name, ...attributes });
   return { input, row: element("label", { class: "field", for: name }, element("span", {}, label), input) };
 }

@@ -17,7 +17,7 @@ import { titleScreen } from "../widgets/title";
 import { keepTrying } from "./keep_trying";
 import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
 import { Screen } from "./screen";
-import type { Kept, Session } from "./session";
+import type { RememberedState, Session } from "./session";
 
 const kRefreshMs = 500;
 const kStatesIntervalMs = 3_000;
@@ -43,11 +43,11 @@ export class MapsScreen extends Screen {
   /** The user has agreed to lose the changes. */
   #discards = false;
 
-  readonly #kept: Kept;
+  readonly #remembered: RememberedState;
 
   constructor(session: Session) {
     super("maps", session);
-    this.#kept = session.kept;
+    this.#remembered = session.remembered;
     this.#view = new MapView<ViewerItem>({
       choose: (view, item) => this.#choose(view, item),
       point: (view) => this.#point(view),
@@ -77,7 +77,7 @@ export class MapsScreen extends Screen {
     this.#loading.abort();
     this.#card.hide();
     // Nobody was asked: the session has ended.
-    if (this.#editor?.isChanged && !this.#discards) this.#kept.mapDraft = this.#editor.draft;
+    if (this.#editor?.isChanged && !this.#discards) this.#remembered.mapDraft = this.#editor.draft;
     this.#editor?.close();
     this.#overlay.close();
     this.#view.close();
@@ -164,7 +164,7 @@ export class MapsScreen extends Screen {
     void this.#loadStates();
     const isEdited = openMap()?.isEdited ?? false;
     if (isEdited) replaceRoute(id);
-    if (this.#kept.mapDraft?.id === id || (isEdited && !this.#edit.hidden)) void this.#openEditor();
+    if (this.#remembered.mapDraft?.id === id || (isEdited && !this.#edit.hidden)) void this.#openEditor();
   }
 
   /** In place of a map. */
@@ -253,9 +253,9 @@ export class MapsScreen extends Screen {
     }
     if (this.#map !== map || this.#editor || this.closed.aborted) return;
     this.#card.hide();
-    const draft = this.#kept.mapDraft?.id === map.id ? this.#kept.mapDraft : null;
+    const draft = this.#remembered.mapDraft?.id === map.id ? this.#remembered.mapDraft : null;
     if (draft) notify("Your changes from before the session ended are here. They are not saved yet.");
-    this.#kept.mapDraft = null;
+    this.#remembered.mapDraft = null;
     this.#discards = false;
     this.#editor = new MapEditor(this.#emaps, edited, draft, map.content.picture, () => {
       if (this.#leaveEditor()) void this.#load(map.id);

@@ -8,7 +8,7 @@ import type { Draft } from "../settings/draft";
 import type { AbsentCameras } from "../wall/absent_cameras";
 
 /** What the page remembers of an account from one screen or session to the next. */
-export interface Kept {
+export interface RememberedState {
   readonly userId: number;
   readonly absentCameras: AbsentCameras;
   /** Changes to a map that were not saved when the session ended. */
@@ -23,7 +23,7 @@ export interface Kept {
 export interface Session {
   readonly server: Server;
   readonly account: Account;
-  readonly kept: Kept;
+  readonly remembered: RememberedState;
   /** Called when the user has logged out. */
   readonly onLogOut: () => void;
 }

@@ -19,7 +19,7 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { titleScreen } from "../widgets/title";
 import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "./route";
 import { Screen } from "./screen";
-import type { Kept, Session } from "./session";
+import type { RememberedState, Session } from "./session";
 import { SetupSteps } from "./setup_steps";
 
 /** Groups are reached from the cameras. */
@@ -49,7 +49,7 @@ const kRecords: Partial<Record<SettingsSection, new (context: PageContext, id: n
 
 export class SettingsScreen extends Screen {
   readonly #session: Session;
-  readonly #kept: Kept;
+  readonly #remembered: RememberedState;
   readonly #links: HTMLAnchorElement[] = [];
   readonly #place = element("div", { class: "settings-page" });
   readonly #steps = new SetupSteps();
@@ -62,7 +62,7 @@ export class SettingsScreen extends Screen {
   constructor(session: Session) {
     super("settings", session);
     this.#session = session;
-    this.#kept = session.kept;
+    this.#remembered = session.remembered;
     this.progress.hidden = true;
     this.addToBar(element("span", { class: "bar-gap" }));
     if (!session.account.is_manager) {
@@ -75,7 +75,7 @@ export class SettingsScreen extends Screen {
       this.#links.push(element("a", { class: "settings-link", href }, icon(name), element("span", {}, label)));
     }
     const sections = element("nav", { class: "settings-nav", "aria-label": "Settings" }, ...this.#links);
-    if (this.#kept.isSettingUp) this.front.append(this.#steps.root);
+    if (this.#remembered.isSettingUp) this.front.append(this.#steps.root);
     this.front.append(element("div", { class: "settings-body" }, sections, this.#place));
     addEventListener("beforeunload", (event) => this.#page?.isChanged && event.preventDefault(), { signal: this.closed });
     this.#open();
@@ -84,7 +84,7 @@ export class SettingsScreen extends Screen {
   override close(): void {
     super.close();
     this.#closePage();
-    this.#kept.isSettingUp = false;
+    this.#remembered.isSettingUp = false;
   }
 
   /** Asks first where changes would be lost. */
@@ -119,8 +119,8 @@ export class SettingsScreen extends Screen {
     const route = openSettings();
     this.#address = addressOf(route);
     this.#steps.show(route);
-    const draft = this.#kept.settingsDraft?.address === this.#address ? this.#kept.settingsDraft.draft : null;
-    if (draft) this.#kept.settingsDraft = null;
+    const draft = this.#remembered.settingsDraft?.address === this.#address ? this.#remembered.settingsDraft.draft : null;
+    if (draft) this.#remembered.settingsDraft = null;
     const leave = (isAsked: boolean) => {
       this.#discards = !isAsked;
       leaveSettingsRecord();
@@ -147,7 +147,7 @@ export class SettingsScreen extends Screen {
   #closePage(): void {
     const draft = this.#discards ? null : (this.#page?.draft ?? null);
     // Nobody was asked: the session has ended.
-    if (draft) this.#kept.settingsDraft = { address: this.#address, draft };
+    if (draft) this.#remembered.settingsDraft = { address: this.#address, draft };
     this.#page?.close();
     this.#page = null;
     this.#discards = false;

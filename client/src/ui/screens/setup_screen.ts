@@ -6,7 +6,7 @@
 import { asServerError, type Account, type Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { passwordProblem } from "./account_menu";
-import { brand, entranceField } from "./login_screen";
+import { brand, credentialField } from "./login_screen";
 
 const kName = /^[A-Za-z0-9][A-Za-z0-9._@-]{0,63}$/;
 const kNameRule = "A name has up to 64 letters, digits and . _ @ -, and begins with a letter or digit.";
@@ -22,14 +22,14 @@ export interface SetupOutcome {
 export function setupScreen(server: Server, token: () => string | null, outcome: SetupOutcome): HTMLElement {
   const plain = { type: "text", autocomplete: "username", autocapitalize: "none", spellcheck: "false" };
   const secret = { type: "password", autocomplete: "new-password", maxlength: "1024" };
-  const name = entranceField("account", "Account", plain);
-  const password = entranceField("password", "Password (at least eight characters)", secret);
-  const again = entranceField("password-again", "Repeat password", secret);
+  const name = credentialField("account", "Account", plain);
+  const password = credentialField("password", "Password (at least eight characters)", secret);
+  const again = credentialField("password-again", "Repeat password", secret);
   const submit = element("button", { type: "submit", class: "button primary" }, "Make the account");
   const message = element("p", { class: "login-message", role: "alert" });
   const form = element(
     "form",
-    { class: "entrance-form", method: "post", novalidate: true },
+    { class: "setup-form", method: "post", novalidate: true },
     brand(),
     element("h2", {}, "Set up Lookhaven"),
     text("First an account of your own, which may do everything; then a camera, and where to record it."),
@@ -78,11 +78,11 @@ export function noAccountScreen(askAgain: () => Promise<void>): HTMLElement {
   });
   const body = element(
     "div",
-    { class: "entrance-form no-account" },
+    { class: "setup-form no-account" },
     brand(),
     element("h2", {}, "No account exists yet"),
     text("On the server, as root or as the user who runs Lookhaven, this command prints an address:"),
-    element("pre", { class: "entrance-command" }, "lookhaven setup-address"),
+    element("pre", { class: "setup-command" }, "lookhaven setup-address"),
     text("Open that address in a browser within 15 minutes to make the first account."),
     again,
     message,
@@ -91,5 +91,5 @@ export function noAccountScreen(askAgain: () => Promise<void>): HTMLElement {
 }
 
 function text(sentence: string): HTMLElement {
-  return element("p", { class: "entrance-text" }, sentence);
+  return element("p", { class: "setup-text" }, sentence);
 }

@@ -36,7 +36,7 @@ export class WallScreen extends Screen {
 
   constructor(session: Session) {
     super("wall", session);
-    this.#absent = session.kept.absentCameras;
+    this.#absent = session.remembered.absentCameras;
     const actions = { back: showWall, step: (by: 1 | -1) => this.#step(by) };
     this.#overlay = new CameraOverlay(this.server, this.root, this.front, actions);
     this.#grid = new Grid(this.server, {

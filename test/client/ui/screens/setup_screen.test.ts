@@ -22,7 +22,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   test("from an address that has expired to the wall, each step in its turn", async () => {
     const page = await open("#setup=dead");
     const [name, password, again] = [page.getByLabel("Account"), page.getByLabel("Password ("), page.getByLabel("Repeat")];
-    expect(await page.evaluate(smallControls, ".entrance-form :is(input, button)")).toEqual([]);
+    expect(await page.evaluate(smallControls, ".setup-form :is(input, button)")).toEqual([]);
     await name.waitFor();
     await page.keyboard.type("-ada");
     await make(page);

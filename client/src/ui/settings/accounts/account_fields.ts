@@ -2,7 +2,7 @@
 //
 // The settings of an account as fields: its name, password, privilege and rights.
 
-import type { UserList, UserRecord, UserSettings } from "../../../wire/people";
+import type { UserList, UserRecord, UserSettings } from "../../../wire/accounts";
 import { passwordProblem } from "../../screens/account_menu";
 import { element } from "../../widgets/dom";
 import { checkField, formPart, formRow, radioField, secretField, textField, type Field, type TextField } from "../../widgets/fields";

@@ -5,7 +5,7 @@
 // Why so        Who leaves a page open gives nobody an account: a new account, password or privilege, and a removal, take
 //               the manager's own password.
 
-import { People, type UserList, type UserRecord } from "../../../wire/people";
+import { Accounts, type UserList, type UserRecord } from "../../../wire/accounts";
 import { asServerError, type ServerError } from "../../../wire/server";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
@@ -32,13 +32,13 @@ const kKind: RecordKind<Settings, UserRecord> = {
 };
 
 export class AccountPage extends RecordPage<UserList, Settings, UserRecord, AccountFields> {
-  readonly #people: People;
+  readonly #accounts: Accounts;
 
   constructor(context: PageContext, id: number | "new") {
     super(context, id, kKind);
-    this.#people = new People(context.server);
+    this.#accounts = new Accounts(context.server);
     this.load(
-      () => this.#people.list(),
+      () => this.#accounts.list(),
       ({ user }) => user,
     );
   }
@@ -58,12 +58,12 @@ export class AccountPage extends RecordPage<UserList, Settings, UserRecord, Acco
 
   protected override above(): Node[] {
     const show = (pressed: HTMLButtonElement) =>
-      void showPreview(this.root, this.#people, this.record!, this.isChanged, pressed);
+      void showPreview(this.root, this.#accounts, this.record!, this.isChanged, pressed);
     return [button("See as this account", show, "plain")];
   }
 
   protected below({ id }: UserRecord): Node[] {
-    const sessions = formPart("Sessions", new SessionsPanel(this.#people, id).root);
+    const sessions = formPart("Sessions", new SessionsPanel(this.#accounts, id).root);
     if (id === this.context.account.user_id) return [sessions];
     return [sessions, formPart("Remove", button("Remove this account…", () => void this.#remove(), "plain"))];
   }
@@ -81,7 +81,7 @@ export class AccountPage extends RecordPage<UserList, Settings, UserRecord, Acco
   ): Promise<UserRecord | null> {
     const { name: _, ...rest } = changes;
     const isHarmless = !("password" in rest) && !("privilege" in rest);
-    if (base && isHarmless) return this.#people.set(base.id, base.revision, rest);
+    if (base && isHarmless) return this.#accounts.set(base.id, base.revision, rest);
     const reason = base ? "A new password or privilege needs your own password." : "A new account needs your own password.";
     let answer: UserRecord | ServerError | null = null;
     await openReauthDialog(this.root, {
@@ -91,8 +91,8 @@ export class AccountPage extends RecordPage<UserList, Settings, UserRecord, Acco
       attempt: async (reauth) => {
         try {
           const added = { ...settings, password: changes.password ?? "" };
-          if (base) answer = await this.#people.set(base.id, base.revision, { ...rest, reauth });
-          else answer = await this.#people.add(added, reauth);
+          if (base) answer = await this.#accounts.set(base.id, base.revision, { ...rest, reauth });
+          else answer = await this.#accounts.add(added, reauth);
         } catch (error) {
           const failure = asServerError(error);
           // Only a wrong password, or no answer, can be mended in the dialog.
@@ -111,7 +111,7 @@ export class AccountPage extends RecordPage<UserList, Settings, UserRecord, Acco
       title: `Remove ${user.name}?`,
       content: [element("p", {}, "Its sessions end, and nobody can log in with it any more. Recordings are not touched.")],
       submit: "Remove",
-      attempt: async (reauth) => void (await this.#people.remove(user, reauth)),
+      attempt: async (reauth) => void (await this.#accounts.remove(user, reauth)),
     });
     if (!isDone) return;
     notify(`${user.name} is removed.`);

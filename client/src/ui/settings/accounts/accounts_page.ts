@@ -2,7 +2,7 @@
 //
 // All accounts: what each may do, whether it is in use, and when it last was.
 
-import { People, type UserList, type UserRecord } from "../../../wire/people";
+import { Accounts, type UserList, type UserRecord } from "../../../wire/accounts";
 import { settingsAddress } from "../../screens/route";
 import { counted } from "../../widgets/amounts";
 import { linkButton } from "../../widgets/button";
@@ -15,7 +15,7 @@ export class AccountsPage extends LoadedPage<UserList> {
   constructor(context: PageContext) {
     super(context, "Accounts", linkButton("Add an account", settingsAddress("accounts", "new"), true));
     void this.start(
-      () => new People(context.server).list(),
+      () => new Accounts(context.server).list(),
       (list) => this.#showList(list),
     );
   }
@@ -38,10 +38,10 @@ export class AccountsPage extends LoadedPage<UserList> {
     const link = element("a", { class: "row-link", href: settingsAddress("accounts", id) }, name);
     return element(
       "li",
-      { class: "person-row" },
-      element("div", { class: "person-name" }, link, element("span", { class: "quiet" }, isOwn ? "you" : "")),
-      part("person-facts", kPrivilegeNames[privilege], `sees ${rightsSummary(deny, list)}${marks}`),
-      part("person-facts quiet", sessions > 0 ? `${counted(sessions, "session")} open` : "not logged in", used),
+      { class: "record-row" },
+      element("div", { class: "record-row-name" }, link, element("span", { class: "quiet" }, isOwn ? "you" : "")),
+      part("record-row-facts", kPrivilegeNames[privilege], `sees ${rightsSummary(deny, list)}${marks}`),
+      part("record-row-facts quiet", sessions > 0 ? `${counted(sessions, "session")} open` : "not logged in", used),
     );
   }
 }

@@ -2,7 +2,7 @@
 //
 // Shows what an account sees, as the server judges it.
 
-import { kCameraRights, type People, type UserRecord } from "../../../wire/people";
+import { type Accounts, kCameraRights, type UserRecord } from "../../../wire/accounts";
 import { asServerError } from "../../../wire/server";
 import { whileBusy } from "../../widgets/button";
 import { element } from "../../widgets/dom";
@@ -14,12 +14,12 @@ import { kRightNames } from "./rights";
 /** `isChanged`: what is shown is stored, and the form holds something else. `pressed` is busy until there is something to show. */
 export async function showPreview(
   host: HTMLElement,
-  people: People,
+  accounts: Accounts,
   { id, name }: UserRecord,
   isChanged: boolean,
   pressed: HTMLButtonElement,
 ): Promise<void> {
-  const asked = people.preview(id).catch((error: unknown) => void notify(asServerError(error).message));
+  const asked = accounts.preview(id).catch((error: unknown) => void notify(asServerError(error).message));
   const cameras = await whileBusy(pressed, asked);
   if (!cameras) return;
   const rows = cameras.map((camera) => {

@@ -9,7 +9,7 @@ import {
   type UserList,
   type UserRecord,
   type UserSettings,
-} from "../../../wire/people";
+} from "../../../wire/accounts";
 
 export const kRightNames: Record<CameraRight, string> = { live: "Live", audio: "Sound", playback: "Playback" };
 export const kPrivilegeNames: Record<UserSettings["privilege"], string> = { viewer: "Viewer", manager: "Manager", owner: "Owner" };

@@ -5,7 +5,7 @@
 // Why so        What is stored is what is denied, so that a new camera is seen by everyone who is not kept from it. A group
 //               that is denied covers its cameras: their own ticks stay as they are and are shown without effect.
 
-import { kCameraRights, type CameraRight, type Denied, type UserList } from "../../../wire/people";
+import { kCameraRights, type CameraRight, type Denied, type UserList } from "../../../wire/accounts";
 import { element } from "../../widgets/dom";
 import { chipsField, type Field } from "../../widgets/fields";
 import { scrolled } from "../../widgets/table";

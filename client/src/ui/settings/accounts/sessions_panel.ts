@@ -2,7 +2,7 @@
 //
 // The open sessions of an account: where each is used, and when it was last; one or all of them are ended.
 
-import type { OpenSession, People } from "../../../wire/people";
+import type { Accounts, OpenSession } from "../../../wire/accounts";
 import { asServerError } from "../../../wire/server";
 import { counted } from "../../widgets/amounts";
 import { button } from "../../widgets/button";
@@ -14,11 +14,11 @@ import { minuteText } from "../../widgets/text";
 
 export class SessionsPanel {
   readonly root = element("div", { class: "form-group" });
-  readonly #people: People;
+  readonly #accounts: Accounts;
   readonly #user: number;
 
-  constructor(people: People, user: number) {
-    this.#people = people;
+  constructor(accounts: Accounts, user: number) {
+    this.#accounts = accounts;
     this.#user = user;
     void this.load();
   }
@@ -26,7 +26,7 @@ export class SessionsPanel {
   async load(): Promise<void> {
     this.root.replaceChildren(element("p", { class: "quiet" }, "Loading…"));
     try {
-      this.#show(await this.#people.sessions(this.#user));
+      this.#show(await this.#accounts.sessions(this.#user));
     } catch (error) {
       const again = button("Try again", () => void this.load());
       this.root.replaceChildren(element("p", { role: "alert" }, asServerError(error).message), again);
@@ -53,7 +53,7 @@ export class SessionsPanel {
 
   async #end(said: string, key: string): Promise<void> {
     try {
-      await this.#people.endSessions(this.#user, key);
+      await this.#accounts.endSessions(this.#user, key);
       notify(said);
     } catch (error) {
       notify(asServerError(error).message);
@@ -67,7 +67,7 @@ export class SessionsPanel {
       content: [element("p", {}, "Whoever uses them must log in again.")],
       submit: "End them",
       attempt: async () => {
-        notify(`${counted(await this.#people.endSessions(this.#user), "session")} ended.`);
+        notify(`${counted(await this.#accounts.endSessions(this.#user), "session")} ended.`);
       },
     });
     if (isDone) await this.load();

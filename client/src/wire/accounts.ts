@@ -64,7 +64,7 @@ export interface SeenCamera extends Named, Record<CameraRight, boolean> {}
 
 const kApi = "VEXO.User";
 
-export class People {
+export class Accounts {
   readonly #server: Server;
 
   constructor(server: Server) {
