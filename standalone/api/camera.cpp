@@ -10,6 +10,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/camera_page.h"
+#include "standalone/api/named_list.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/probe.h"
 #include "standalone/api/revision.h"
@@ -36,17 +37,6 @@ constexpr std::array<std::pair<const char*, const char*>, 12> kUsualPaths{{
     {"live", "/live"},
 }};
 
-template <typename Record>
-Json::Value NamedList(const std::vector<Record>& records) {
-    Json::Value list = Json::arrayValue;
-    for (const Record& record : records) {
-        Json::Value& json = list.append(Json::objectValue);
-        json["id"] = record.id;
-        json["name"] = record.name;
-    }
-    return list;
-}
-
 std::string List(const Call& call) {
     bool counts_footage = true;
     TakeField(call, "footage", counts_footage);
@@ -58,11 +48,8 @@ std::string List(const Call& call) {
         page.Complete(data["camera"].append(admin::ToJson(admin::ReadCamera(records, camera.id))));
     }
     data["group"] = NamedList(store::Groups(records).List());
-    const std::vector<store::Mount> mounts = store::Mounts(records).List();
-    data["mount"] = NamedList(mounts);
-    for (Json::ArrayIndex i = 0; i < data["mount"].size(); ++i) {
-        data["mount"][i]["default"] = mounts[i].is_default;
-    }
+    data["mount"] = NamedList(store::Mounts(records).List(),
+                              [](Json::Value& json, const store::Mount& mount) { json["default"] = mount.is_default; });
     data["path"] = Json::arrayValue;
     for (const auto& [name, path] : kUsualPaths) {
         Json::Value& json = data["path"].append(Json::objectValue);

@@ -5,6 +5,7 @@
 
 #include "platform/camera/camgroup.h"
 #include "platform/privilege/privprofile.h"
+#include "standalone/api/named_list.h"
 #include "standalone/binding/rights.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/recording_status.h"
@@ -33,10 +34,7 @@ std::string Groups(const Call& call) {
     for (const store::CameraGroup& group : store::Groups(call.Records()).List()) {
         CamGroup cameras;
         if (!denied.contains(group.id) && cameras.Load(group.id) == 0) {
-            Json::Value& json = list.append(Json::objectValue);
-            json["id"] = group.id;
-            json["name"] = group.name;
-            json["camera"] = IdsOf(cameras.GetCamMap());
+            AppendNamed(list, group)["camera"] = IdsOf(cameras.GetCamMap());
         }
     }
     return SuccessAnswer(data);
@@ -50,9 +48,7 @@ std::string Mounts(const Call& call) {
     for (const store::Mount& mount : store::Mounts(call.Records()).List()) {
         Json::Value cameras = IdsOf(GetCamMountMap(mount.id, "", true));
         if (is_manager || !cameras.empty()) {
-            Json::Value& json = list.append(Json::objectValue);
-            json["id"] = mount.id;
-            json["name"] = mount.name;
+            Json::Value& json = AppendNamed(list, mount);
             json["is_default"] = mount.is_default;
             json["enabled"] = mount.enabled;
             json["camera"] = std::move(cameras);
@@ -68,9 +64,7 @@ std::string Emaps(const Call& call) {
     Json::Value& list = data["emap"] = Json::arrayValue;
     for (const store::EmapSummary& emap : store::Emaps(call.Records()).List()) {
         if (binding::MaySee(store::DeniableItem::kEmap, emap.id)) {
-            Json::Value& json = list.append(Json::objectValue);
-            json["id"] = emap.id;
-            json["name"] = emap.name;
+            Json::Value& json = AppendNamed(list, emap);
             if (is_manager) {
                 json["item_num"] = emap.item_count;
             }

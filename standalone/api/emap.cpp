@@ -6,6 +6,7 @@
 #include <algorithm>
 
 #include "standalone/api/emap_setup.h"
+#include "standalone/api/named_list.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/emap/item_json.h"
@@ -56,10 +57,10 @@ std::string SaveItems(const Call& call) {
     return SuccessAnswer(data);
 }
 
-Json::Value& AppendNamed(Json::Value& list, int id, const std::string& name, int server_id, int id_on_server) {
-    Json::Value& json = list.append(Json::objectValue);
-    json["id"] = id;
-    json["name"] = name;
+// server_id: 0 for what is of this host.
+template <typename Record>
+Json::Value& AppendPlaceable(Json::Value& list, const Record& record, int server_id, int id_on_server) {
+    Json::Value& json = AppendNamed(list, record);
     json["hxId"] = server_id;
     json["idOnRec"] = id_on_server;
     return json;
@@ -68,16 +69,16 @@ Json::Value& AppendNamed(Json::Value& list, int id, const std::string& name, int
 Json::Value CameraList(store::Store& records) {
     Json::Value list(Json::arrayValue);
     std::map<int, store::PortCounts> ports = store::Devices(records).CameraPorts();
-    const auto append = [&](int id, const std::string& name, int server_id, int id_on_server) {
-        Json::Value& json = AppendNamed(list, id, name, server_id, id_on_server);
-        json["inputs"] = ports[id].inputs;
-        json["outputs"] = ports[id].outputs;
+    const auto append = [&](const auto& camera, int server_id, int id_on_server) {
+        Json::Value& json = AppendPlaceable(list, camera, server_id, id_on_server);
+        json["inputs"] = ports[camera.id].inputs;
+        json["outputs"] = ports[camera.id].outputs;
     };
     for (const store::Camera& camera : store::Cameras(records).List()) {
-        append(camera.id, camera.name, 0, camera.id);
+        append(camera, 0, camera.id);
     }
     for (const store::RemoteCamera& camera : store::RecordingServers(records).ListCameras()) {
-        append(camera.id, camera.name, camera.server_id, camera.id_on_server);
+        append(camera, camera.server_id, camera.id_on_server);
     }
     return list;
 }
@@ -85,7 +86,7 @@ Json::Value CameraList(store::Store& records) {
 Json::Value DeviceList(store::Store& records, EmapItemType kind) {
     Json::Value list(Json::arrayValue);
     for (const store::Device& device : store::Devices(records).List(kind)) {
-        Json::Value& json = AppendNamed(list, device.id, device.name, device.server_id, device.id_on_server);
+        Json::Value& json = AppendPlaceable(list, device, device.server_id, device.id_on_server);
         json["camera"] = device.camera_id;
         json["port"] = Json::arrayValue;
         for (const auto& [index, port] : device.ports) {
@@ -105,7 +106,7 @@ std::string Devices(const Call& call) {
     data["camera"] = CameraList(records);
     data["emap"] = Json::arrayValue;
     for (const store::Emap& emap : store::Emaps(records).List()) {
-        AppendNamed(data["emap"], emap.id, emap.name, 0, emap.id);
+        AppendPlaceable(data["emap"], emap, 0, emap.id);
     }
     data["door"] = DeviceList(records, EmapItemType::kDoor);
     data["io"] = DeviceList(records, EmapItemType::kIoModule);

@@ -4,6 +4,7 @@
 #include "standalone/api/own_apis.h"
 
 #include "platform/admission/pairauth.h"
+#include "standalone/api/named_list.h"
 #include "standalone/store/cameras.h"
 
 namespace lookhaven::api {
@@ -21,14 +22,11 @@ std::string Cameras(const Call& call) {
         throw Failure(401, "no token of a paired host");
     }
     Json::Value data;
-    data["camera"] = Json::arrayValue;
-    for (const store::Camera& camera : store::Cameras(call.Records()).List()) {
-        Json::Value& json = data["camera"].append(Json::objectValue);
-        json["id"] = camera.id;
-        json["name"] = camera.name;
-        json["video"] = static_cast<int>(camera.video_type);
-        json["audio"] = camera.audio;
-    }
+    data["camera"] =
+        NamedList(store::Cameras(call.Records()).List(), [](Json::Value& json, const store::Camera& camera) {
+            json["video"] = static_cast<int>(camera.video_type);
+            json["audio"] = camera.audio;
+        });
     return SuccessAnswer(data);
 }
 

@@ -9,6 +9,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/admin/user_record.h"
 #include "standalone/admin/users.h"
+#include "standalone/api/named_list.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/revision.h"
@@ -51,35 +52,14 @@ auto Completer(const Call& call) {
     return [&call](const Json::Value& record) { return WithUse(record, Uses(call)); };
 }
 
-// What is read of each record beside its id and name, too.
-template <typename Records, typename Add>
-Json::Value Named(const Records& records, Add add) {
-    Json::Value list = Json::arrayValue;
-    for (const auto& record : records) {
-        Json::Value& json = list.append(Json::objectValue);
-        json["id"] = record.id;
-        json["name"] = record.name;
-        add(json, record);
-    }
-    return list;
-}
-
-template <typename Records>
-Json::Value Named(const Records& records) {
-    return Named(records, [](Json::Value&, const auto&) {});
-}
-
 // This host's, then those of recording servers, with the server's name.
 Json::Value CamerasToDeny(store::Store& records) {
-    Json::Value list = Named(store::Cameras(records).List());
+    Json::Value list = NamedList(store::Cameras(records).List());
     store::RecordingServers servers(records);
     const std::vector<store::RecordingServer> known = servers.List();
     for (const store::RemoteCamera& camera : servers.ListCameras()) {
         const auto server = std::ranges::find(known, camera.server_id, &store::RecordingServer::id);
-        Json::Value& json = list.append(Json::objectValue);
-        json["id"] = camera.id;
-        json["name"] = camera.name;
-        json["server"] = server == known.end() ? "" : server->name;
+        AppendNamed(list, camera)["server"] = server == known.end() ? "" : server->name;
     }
     return list;
 }
@@ -94,15 +74,15 @@ std::string List(const Call& call) {
         data["user"].append(WithUse(admin::UserRecord(records, user), uses));
     }
     data["camera"] = CamerasToDeny(records);
-    data["group"] = Named(store::Groups(records).List(), [](Json::Value& json, const store::CameraGroup& group) {
+    data["group"] = NamedList(store::Groups(records).List(), [](Json::Value& json, const store::CameraGroup& group) {
         json["camera"] = Json::arrayValue;
         for (const int camera : group.camera_ids) {
             json["camera"].append(camera);
         }
     });
-    data["door"] = Named(devices.List(store::EmapItemType::kDoor));
-    data["ioModule"] = Named(devices.List(store::EmapItemType::kIoModule));
-    data["emap"] = Named(store::Emaps(records).List());
+    data["door"] = NamedList(devices.List(store::EmapItemType::kDoor));
+    data["ioModule"] = NamedList(devices.List(store::EmapItemType::kIoModule));
+    data["emap"] = NamedList(store::Emaps(records).List());
     return SuccessAnswer(data);
 }
 
@@ -201,12 +181,12 @@ std::string EndSessions(const Call& call) {
 
 std::string Preview(const Call& call) {
     Json::Value data;
-    data["camera"] = Named(admin::CamerasAsSeenBy(call.Records(), IdOf(call)),
-                           [](Json::Value& json, const admin::VisibleCamera& camera) {
-                               json["live"] = camera.live;
-                               json["audio"] = camera.audio;
-                               json["playback"] = camera.playback;
-                           });
+    data["camera"] = NamedList(admin::CamerasAsSeenBy(call.Records(), IdOf(call)),
+                               [](Json::Value& json, const admin::VisibleCamera& camera) {
+                                   json["live"] = camera.live;
+                                   json["audio"] = camera.audio;
+                                   json["playback"] = camera.playback;
+                               });
     return SuccessAnswer(data);
 }
 
