@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/json_text.h"
 #include "standalone/store/audit_log.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/transaction.h"
@@ -21,7 +22,7 @@ std::string AuditText(const Json::Value& record) {
     if (record.isNull()) {
         return "";
     }
-    std::string text = ToText(record);
+    std::string text = base::OneLineJson(record);
     return text.size() <= kMaxRecordBytes ? text : R"({"tooLarge":)" + std::to_string(text.size()) + "}";
 }
 
@@ -53,7 +54,7 @@ std::string Named(const std::string& name, int id) {
 }
 
 std::int64_t RevisionOf(const Json::Value& record) {
-    const std::string digits = store::Digest(ToText(WithoutRevision(record))).substr(0, kRevisionDigits);
+    const std::string digits = store::Digest(base::OneLineJson(WithoutRevision(record))).substr(0, kRevisionDigits);
     std::int64_t revision = 0;
     std::from_chars(digits.data(), digits.data() + digits.size(), revision, 16);
     return revision;
@@ -63,12 +64,6 @@ void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen)
     if (seen && *seen != record["revision"].asInt64()) {
         throw Stale(record);
     }
-}
-
-std::string ToText(const Json::Value& value) {
-    Json::StreamWriterBuilder writer;
-    writer["indentation"] = "";
-    return Json::writeString(writer, value);
 }
 
 Json::Value FromText(const std::string& text) {

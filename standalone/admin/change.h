@@ -60,9 +60,7 @@ class StillNeeded : public std::runtime_error {
 // Apply.
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen);
 
-// JSON in one line; the same text for equal records.
-std::string ToText(const Json::Value& value);
-// Null for an empty text.
+// A record as base::OneLineJson wrote it into the audit log; null for an empty text.
 Json::Value FromText(const std::string& text);
 
 }  // namespace lookhaven::admin

@@ -17,6 +17,7 @@
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
+#include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/rights.h"
 #include "standalone/emap/map_picture.h"
@@ -164,7 +165,7 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
     } catch (const store::Conflict& error) {
         throw Failure(409, error.what());
     } catch (const admin::Stale& error) {
-        throw Failure(409, error.what(), 0, admin::ToText(error.Record()));
+        throw Failure(409, error.what(), 0, base::OneLineJson(error.Record()));
     } catch (const admin::StillNeeded& error) {
         throw Failure(409, error.what());
     } catch (const admin::Forbidden& error) {

@@ -15,6 +15,7 @@
 #include "standalone/api/health.h"
 #include "standalone/api/metrics.h"
 #include "standalone/api/own_apis.h"
+#include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/base/text.h"
 #include "standalone/store/audit_log.h"
@@ -92,7 +93,7 @@ std::string Health(const Call& call) {
         json["message"] = problem.message;
     }
     call.slot.status = problems.empty() ? 200 : 503;
-    return http::JsonAnswer(call.slot.status, admin::ToText(answer) + '\n');
+    return http::JsonAnswer(call.slot.status, base::OneLineJson(answer) + '\n');
 }
 
 std::string Metrics(const Call& call) {

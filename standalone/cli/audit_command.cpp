@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven audit: what was changed, by whom and from where.
-#include "standalone/admin/change.h"
+#include "standalone/base/json_text.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
@@ -37,7 +37,8 @@ std::string ChangesText(const Json::Value& entry) {
     for (const std::string& name : after.getMemberNames()) {
         if (before[name] != after[name]) {
             text += (text.empty() ? "" : "; ") + name + ": " +
-                    (before.isMember(name) ? admin::ToText(before[name]) + " -> " : "") + admin::ToText(after[name]);
+                    (before.isMember(name) ? base::OneLineJson(before[name]) + " -> " : "") +
+                    base::OneLineJson(after[name]);
         }
     }
     return text;

@@ -8,6 +8,7 @@
 #include <termios.h>
 #include <unistd.h>
 
+#include "standalone/base/json_text.h"
 #include "standalone/base/state_folder.h"
 
 namespace lookhaven::cli {
@@ -91,7 +92,8 @@ store::Store Console::OpenStore() const {
 }
 
 void Console::Print(const Json::Value& data, std::string_view text) const {
-    std::cout << (json ? ToJson(data) : text) << (json || (!text.empty() && text.back() != '\n') ? "\n" : "");
+    std::cout << (json ? base::IndentedJson(data) : text)
+              << (json || (!text.empty() && text.back() != '\n') ? "\n" : "");
 }
 
 std::string ReadPassword(const std::string& account, bool is_new) {

@@ -7,6 +7,7 @@
 
 #include "standalone/admin/emaps.h"
 #include "standalone/base/file.h"
+#include "standalone/base/json_text.h"
 #include "standalone/base/text.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
@@ -116,7 +117,7 @@ void Export(const Console& console, const Request& request) {
     const Json::Value file = Object("lookhaven_emap", kFileVersion, "name", emap.name, "hideItemName", emap.hide_names,
                                     "smallItemSize", emap.small_items, "items",
                                     emap::ToJson(Emaps(store).Items(emap.id)), "picture", base::ToBase64(picture));
-    base::WriteFileAtomically(request.file, ToJson(file) + "\n", 0644);
+    base::WriteFileAtomically(request.file, base::IndentedJson(file) + "\n", 0644);
     console.Answer(Object("id", emap.id, "file", request.file), "Wrote e-map ", emap.name, " to ", request.file, ".");
 }
 

@@ -5,13 +5,6 @@
 
 namespace lookhaven::cli {
 
-std::string ToJson(const Json::Value& value) {
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "  ";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, value);
-}
-
 Json::Value ParseJson(const std::string& text) {
     Json::CharReaderBuilder builder;
     builder["stackLimit"] = 8;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// JSON as commands read, write and put it together.
+// JSON as commands read it and put it together.
 #pragma once
 
 #include <string>
@@ -9,7 +9,6 @@
 
 namespace lookhaven::cli {
 
-std::string ToJson(const Json::Value& value);
 // Null for what is no JSON or nested too deeply.
 Json::Value ParseJson(const std::string& text);
 

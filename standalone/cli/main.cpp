@@ -9,6 +9,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/admin/mount_claim.h"
 #include "standalone/archive/archive_error.h"
+#include "standalone/base/json_text.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
@@ -37,7 +38,7 @@ ExitCode CodeOf(const admin::UnusableFolder& error) {
 int Report(const Console& console, ExitCode code, const std::string& sentence) {
     if (console.json) {
         const Json::Value error = Object("code", static_cast<int>(code), "message", sentence);
-        std::cerr << ToJson(Object("error", error)) << '\n';
+        std::cerr << base::IndentedJson(Object("error", error)) << '\n';
     } else {
         std::cerr << "lookhaven: " << sentence << '\n';
     }

@@ -3,6 +3,7 @@
 
 #include <optional>
 
+#include "standalone/base/json_text.h"
 #include "standalone/base/text.h"
 #include "standalone/cli/console.h"
 
@@ -47,8 +48,8 @@ std::string ToText(const PairOffer& offer) {
                       "audio", camera.audio);
     });
     return std::string(kPrefix) +
-           base::ToBase64(ToJson(Object("address", offer.address, "port", offer.port, "certificate", offer.certificate,
-                                        "secret", offer.secret, "cameras", cameras)));
+           base::ToBase64(base::IndentedJson(Object("address", offer.address, "port", offer.port, "certificate",
+                                                    offer.certificate, "secret", offer.secret, "cameras", cameras)));
 }
 
 PairOffer ParsePairText(const std::string& text) {

@@ -8,6 +8,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/host_name.h"
+#include "standalone/base/json_text.h"
 #include "standalone/base/sha256.h"
 
 namespace lookhaven::evidence {
@@ -62,10 +63,7 @@ std::string TextOf(const Plan& plan, std::span<const WrittenFile> written) {
             ++next;
         }
     }
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "  ";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, json) + '\n';
+    return base::IndentedJson(json) + '\n';
 }
 
 }  // namespace
