@@ -7,12 +7,14 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/codec_words.h"
 #include "standalone/base/host_name.h"
 #include "standalone/base/local_time.h"
 #include "standalone/store/events.h"
 #include "standalone/store/footage_removals.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/text.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::admin {
 
@@ -32,9 +34,7 @@ Json::Value PlanJson(const std::optional<RecordingPlan>& stored) {
     plan.pre_s = 0;
     plan = stored.value_or(plan);
     Json::Value json;
-    json["mode"] = plan.mode == store::RecordMode::kAlways  ? "always"
-                   : plan.mode == store::RecordMode::kNever ? "never"
-                                                            : "schedule";
+    json["mode"] = base::NameOf(store::RecordModeNames(), plan.mode);
     json["hours"] = plan.hours.empty()
                         ? std::string(base::kHoursOfWeek, static_cast<char>(store::HourMode::kAroundMarks))
                         : plan.hours;
@@ -100,10 +100,6 @@ bool HasOpenEvent(store::Store& store, int camera) {
 
 }  // namespace
 
-const char* CodecWord(base::Codec codec) {
-    return codec == base::Codec::kMjpeg ? "mjpeg" : codec == base::Codec::kH264 ? "h264" : "h265";
-}
-
 void RequireSource(const media::SourceKinds& kinds, const std::string& source) {
     if (media::FindKind(kinds, source) == nullptr || !store::IsSource(source)) {
         throw store::InvalidRecord("a source begins with " + media::ListKinds(kinds) +
@@ -162,7 +158,7 @@ Json::Value ToJson(const CameraSetup& setup) {
         json["group"].append(group);
     }
     json["revision"] = Json::Int64{RevisionOf(json)};
-    json["codec"] = CodecWord(camera.video_type);
+    json["codec"] = base::CodecWord(camera.video_type);
     return json;
 }
 

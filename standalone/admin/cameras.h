@@ -31,9 +31,6 @@ struct CameraSetup {
 // Changes a setup; whatever it throws ends the change.
 using CameraEdit = std::function<void(CameraSetup&)>;
 
-// "mjpeg", "h264" or "h265", as web pages and their requests name the codec of a camera.
-const char* CodecWord(base::Codec codec);
-
 // Throws store::InvalidRecord for an address that begins with none of the kinds, names no valid host or port, or holds
 // an account or password.
 void RequireSource(const media::SourceKinds& kinds, const std::string& source);

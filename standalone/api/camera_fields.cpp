@@ -2,10 +2,13 @@
 #include "standalone/api/camera_fields.h"
 
 #include <algorithm>
-#include <map>
 #include <set>
 #include <utility>
 #include <vector>
+
+#include "standalone/base/codec_words.h"
+#include "standalone/base/text.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
 
@@ -40,8 +43,7 @@ void Take(const Json::Value& value, const std::string& name, std::string& target
 }
 
 template <typename Value>
-void TakeNamed(const Json::Value& value, const std::string& name, const std::map<std::string, Value>& names,
-               Value& target) {
+void TakeNamed(const Json::Value& value, const std::string& name, const base::Names<Value>& names, Value& target) {
     if (value.isNull()) {
         return;
     }
@@ -55,13 +57,6 @@ void TakeNamed(const Json::Value& value, const std::string& name, const std::map
     }
     target = found->second;
 }
-
-const std::map<std::string, base::Codec> kCodecs = {{admin::CodecWord(base::Codec::kMjpeg), base::Codec::kMjpeg},
-                                                    {admin::CodecWord(base::Codec::kH264), base::Codec::kH264},
-                                                    {admin::CodecWord(base::Codec::kH265), base::Codec::kH265}};
-const std::map<std::string, store::RecordMode> kModes = {{"always", store::RecordMode::kAlways},
-                                                         {"never", store::RecordMode::kNever},
-                                                         {"schedule", store::RecordMode::kSchedule}};
 
 // A profile keeps what the list does not say of it.
 void TakeSources(const Json::Value& list, store::Camera& camera) {
@@ -98,7 +93,7 @@ void TakePlan(const Json::Value& json, std::optional<RecordingPlan>& stored) {
         Refuse("plan", "an object");
     }
     RecordingPlan plan = stored.value_or(RecordingPlan());
-    TakeNamed(json["mode"], "plan.mode", kModes, plan.mode);
+    TakeNamed(json["mode"], "plan.mode", store::RecordModeNames(), plan.mode);
     Take(json["hours"], "plan.hours", plan.hours);
     Take(json["segment"], "plan.segment", plan.segment_s);
     Take(json["pre"], "plan.pre", plan.pre_s);
@@ -138,9 +133,8 @@ std::string ServerOf(const std::string& address) {
     const std::size_t colon = place.find(':', place.starts_with('[') ? std::min(place.find(']'), place.size()) : 0);
     const std::string scheme = address.substr(0, scheme_end);
     const std::string port = colon == place.npos ? "" : place.substr(colon + 1);
-    std::string server = scheme + "://" + place.substr(0, colon) + ':' + (port.empty() ? DefaultPort(scheme) : port);
-    std::ranges::transform(server, server.begin(), [](char c) { return c >= 'A' && c <= 'Z' ? char(c + 32) : c; });
-    return server;
+    return base::LowerAscii(scheme + "://" + place.substr(0, colon) + ':' +
+                            (port.empty() ? DefaultPort(scheme) : port));
 }
 
 std::set<std::string> ServersOf(const store::Camera& camera) {
@@ -202,7 +196,7 @@ void TakeCameraFields(const Call& call, admin::CameraSetup& setup) {
         // Until the recorder has seen it, unless the caller has.
         camera.video_type = LiveAddress(camera).starts_with("http") ? base::Codec::kMjpeg : base::Codec::kH264;
     }
-    TakeNamed(call.Parameter("codec"), "codec", kCodecs, camera.video_type);
+    TakeNamed(call.Parameter("codec"), "codec", base::VideoCodecWords(), camera.video_type);
     std::vector<std::string> addresses;
     for (const CameraProfile& profile : camera.profiles) {
         addresses.push_back(profile.source);

@@ -8,6 +8,7 @@
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/still_picture.h"
+#include "standalone/base/codec_words.h"
 #include "standalone/base/text.h"
 #include "standalone/camera/isolated_source.h"
 
@@ -41,7 +42,7 @@ std::string PictureOf(const Call& call, media::ProbeResult& found) {
 
 Json::Value Describe(const Call& call, media::ProbeResult found) {
     Json::Value data;
-    data["codec"] = admin::CodecWord(found.video.codec);
+    data["codec"] = base::CodecWord(found.video.codec);
     data["width"] = found.video.width;
     data["height"] = found.video.height;
     data["rate"] = found.frames_per_second;

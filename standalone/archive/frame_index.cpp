@@ -118,12 +118,10 @@ struct flock WholeFile(short type) {
 }  // namespace
 
 bool IsPossible(const IndexHeader& header) {
-    const auto is_one_of = [](const std::string& name, std::initializer_list<const char*> names) {
-        return std::find(names.begin(), names.end(), name) != names.end();
-    };
-    return is_one_of(header.codec, {"MJPEG", "H264", "H265"}) &&
-           is_one_of(header.audio_codec, {"", "AAC", "PCMU", "PCMA", "OPUS"}) && header.width > 0 &&
-           header.width <= kMaxSidePixels && header.height > 0 && header.height <= kMaxSidePixels &&
+    const std::optional<base::Codec> video = base::CodecNamed(header.codec);
+    const std::optional<base::Codec> audio = base::CodecNamed(header.audio_codec);
+    return video && base::IsVideo(*video) && (header.audio_codec.empty() || (audio && !base::IsVideo(*audio))) &&
+           header.width > 0 && header.width <= kMaxSidePixels && header.height > 0 && header.height <= kMaxSidePixels &&
            header.start_wall_ms >= 0 && header.start_wall_ms < kMaxWallMs;
 }
 

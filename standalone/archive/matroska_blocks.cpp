@@ -39,19 +39,23 @@ constexpr std::uint8_t kKeyFlag = 0x80;
 constexpr std::uint8_t kLacingFlags = 0x06;
 constexpr std::int64_t kYear2001Ms = 978'307'200'000;
 
+using base::Codec;
+
 std::string CodecNameOf(const std::string& id, std::span<const std::uint8_t> private_data) {
-    static constexpr std::pair<const char*, const char*> kCodecs[] = {
-        {"V_MJPEG", "MJPEG"}, {"V_MPEG4/ISO/AVC", "H264"}, {"V_MPEGH/ISO/HEVC", "H265"},
-        {"A_AAC", "AAC"},     {"A_OPUS", "OPUS"},
+    static constexpr std::pair<const char*, Codec> kCodecs[] = {
+        {"V_MJPEG", Codec::kMjpeg}, {"V_MPEG4/ISO/AVC", Codec::kH264}, {"V_MPEGH/ISO/HEVC", Codec::kH265},
+        {"A_AAC", Codec::kAac},     {"A_OPUS", Codec::kOpus},
     };
-    for (const auto& [known, name] : kCodecs) {
+    for (const auto& [known, codec] : kCodecs) {
         if (id == known) {
-            return name;
+            return base::CodecName(codec);
         }
     }
     // Sound in a Windows format: its private data begins with the format's number.
     if (id == "A_MS/ACM" && private_data.size() >= 2 && private_data[1] == 0) {
-        return private_data[0] == 6 ? "PCMA" : private_data[0] == 7 ? "PCMU" : "";
+        return private_data[0] == 6   ? base::CodecName(Codec::kPcmAlaw)
+               : private_data[0] == 7 ? base::CodecName(Codec::kPcmMulaw)
+                                      : "";
     }
     return "";
 }

@@ -100,6 +100,13 @@ std::optional<std::string> FromBase64(std::string_view text) {
     return bytes;
 }
 
+std::string LowerAscii(std::string_view text) {
+    std::string lower(text);
+    std::ranges::transform(lower, lower.begin(),
+                           [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; });
+    return lower;
+}
+
 std::string ToHex(std::span<const unsigned char> bytes) {
     std::string text(2 * bytes.size() + 1, '\0');
     sodium_bin2hex(text.data(), text.size(), bytes.data(), bytes.size());

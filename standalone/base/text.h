@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Encodings of text and bytes: UTF-8, percent escapes, base64, hexadecimal digits.
+// Encodings of text and bytes: UTF-8, percent escapes, base64, hexadecimal digits; and ASCII letters in lower case.
 #pragma once
 
 #include <optional>
@@ -26,6 +26,9 @@ std::optional<std::string> DecodeForm(std::string_view text, BrokenEscape broken
 // With padding, without line breaks; FromBase64 takes nothing else.
 std::string ToBase64(std::string_view bytes);
 std::optional<std::string> FromBase64(std::string_view text);
+
+// Whatever the locale; all other bytes stay.
+std::string LowerAscii(std::string_view text);
 
 constexpr std::string_view kHexDigits = "0123456789abcdef";
 

@@ -5,6 +5,7 @@
 
 #include "standalone/admin/camera_stream.h"
 #include "standalone/admin/cameras.h"
+#include "standalone/base/codec_words.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
@@ -130,7 +131,7 @@ void Add(const Console& console, const Request& request) {
         ApplyPlan(camera, request);
     });
     console.Answer(ToData(setup.camera, setup.plan.value_or(RecordingPlan())), "Added camera ", setup.camera.name,
-                   " with id ", setup.camera.id, "; it sends ", VideoTypeName(setup.camera.video_type), ".");
+                   " with id ", setup.camera.id, "; it sends ", base::CodecTitle(setup.camera.video_type), ".");
 }
 
 void Edit(admin::CameraSetup& setup, const Request& request) {

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "standalone/base/codec_words.h"
 #include "standalone/cli/units.h"
 #include "standalone/pattern/pattern_source.h"
 
@@ -13,8 +14,6 @@ namespace {
 using store::Camera;
 using store::CameraProfile;
 
-const Names<base::Codec> kTypes = {
-    {"mjpeg", base::Codec::kMjpeg}, {"h264", base::Codec::kH264}, {"h265", base::Codec::kH265}};
 const Names<int> kProfiles = {{"high", 0}, {"low", 1}, {"mobile", 2}};
 
 // "640x360"
@@ -47,7 +46,7 @@ void AssignIfGiven(T& target, const std::optional<T>& given) {
 
 void CameraOptions::AddTo(Command& command) {
     command.Option("--name", name_, "The camera's name")
-        .Option("--type", type_, "The video codec (default: probed)", OneOf(kTypes))
+        .Option("--type", type_, "The video codec (default: probed)", OneOf(base::VideoCodecWords()))
         .Option("--live", live_profile_, "The profile shown in the live view (initially high)", OneOf(kProfiles))
         .Switch("--enable,!--disable", enabled_, "Whether it is shown and recorded")
         .Switch("--ptz,!--no-ptz", ptz_, "Whether it can pan, tilt and zoom")
@@ -100,12 +99,8 @@ const Names<int>& ProfileNames() {
     return kProfiles;
 }
 
-const char* VideoTypeName(base::Codec type) {
-    return type == base::Codec::kMjpeg ? "MJPEG" : type == base::Codec::kH264 ? "H.264" : "H.265";
-}
-
 std::string VideoTypeText(const Json::Value& type) {
-    return VideoTypeName(static_cast<base::Codec>(type.asInt()));
+    return base::CodecTitle(static_cast<base::Codec>(type.asInt()));
 }
 
 }  // namespace lookhaven::cli

@@ -46,9 +46,7 @@ class CameraOptions {
 // The names of the profiles and their numbers.
 const Names<int>& ProfileNames();
 
-// "H.264" and so on.
-const char* VideoTypeName(base::Codec type);
-// The same for a member "video_type".
+// base::CodecTitle for a member "video_type".
 std::string VideoTypeText(const Json::Value& type);
 
 }  // namespace lookhaven::cli

@@ -3,6 +3,7 @@
 
 #include <utility>
 
+#include "standalone/base/codec_words.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
@@ -105,7 +106,7 @@ std::string Description(const store::Event& event) {
     return Concat(
         "Event ", event.id, " of camera ", event.camera_id, ", ", reason, event.recording ? ", still recording" : "",
         event.archived ? ", kept" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
-        "\nto     ", FormatMoment(event.end_s), "\nvideo  ", VideoTypeName(event.video_type), " ", event.width, "x",
+        "\nto     ", FormatMoment(event.end_s), "\nvideo  ", base::CodecTitle(event.video_type), " ", event.width, "x",
         event.height, ", ", event.frame_count, " frames\naudio  ",
         event.audio_codec.empty() ? "none" : event.audio_codec, "\nsize   ", FormatSize(event.size_bytes), "\n");
 }

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/login_throttle.h"
 
-#include <algorithm>
 #include <string>
 
+#include "standalone/base/text.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/secret.h"
 
@@ -16,10 +16,7 @@ constexpr std::int64_t kWindowS = 60;
 
 // One key of fixed form out of two texts of any form and length; names are compared without regard to case.
 std::string Origin(std::string_view account, std::string_view address) {
-    std::string text(account);
-    std::transform(text.begin(), text.end(), text.begin(),
-                   [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; });
-    return Digest(Digest(text).append(address));
+    return Digest(Digest(base::LowerAscii(account)).append(address));
 }
 
 }  // namespace
