@@ -8,6 +8,7 @@
 
 #include "standalone/base/codec_words.h"
 #include "standalone/base/text.h"
+#include "standalone/media/source_kinds.h"
 #include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
@@ -118,10 +119,6 @@ void TakeGroups(const Json::Value& list, std::set<int>& groups) {
     }
 }
 
-std::string DefaultPort(const std::string& scheme) {
-    return scheme == "rtsp" ? "554" : scheme == "http" ? "80" : scheme == "https" ? "443" : "";
-}
-
 // Whom an address sends a password to: scheme, host and port. Empty for what is not in the network.
 std::string ServerOf(const std::string& address) {
     const std::size_t scheme_end = address.find("://");
@@ -131,10 +128,12 @@ std::string ServerOf(const std::string& address) {
     const std::size_t begin = scheme_end + 3;
     const std::string place = address.substr(begin, address.find_first_of("/?#", begin) - begin);
     const std::size_t colon = place.find(':', place.starts_with('[') ? std::min(place.find(']'), place.size()) : 0);
-    const std::string scheme = address.substr(0, scheme_end);
-    const std::string port = colon == place.npos ? "" : place.substr(colon + 1);
-    return base::LowerAscii(scheme + "://" + place.substr(0, colon) + ':' +
-                            (port.empty() ? DefaultPort(scheme) : port));
+    std::string port = colon == place.npos ? "" : place.substr(colon + 1);
+    const media::NetworkKind* kind = media::FindNetworkKind(address);
+    if (port.empty() && kind != nullptr) {
+        port = kind->default_port;
+    }
+    return base::LowerAscii(address.substr(0, begin) + place.substr(0, colon) + ':' + port);
 }
 
 std::set<std::string> ServersOf(const store::Camera& camera) {
@@ -194,7 +193,8 @@ void TakeCameraFields(const Call& call, admin::CameraSetup& setup) {
     TakeSources(call.Parameter("source"), camera);
     if (LiveAddress(camera) != LiveAddress(before.camera)) {
         // Until the recorder has seen it, unless the caller has.
-        camera.video_type = LiveAddress(camera).starts_with("http") ? base::Codec::kMjpeg : base::Codec::kH264;
+        const media::NetworkKind* kind = media::FindNetworkKind(LiveAddress(camera));
+        camera.video_type = kind == nullptr ? base::Codec::kH264 : kind->usual_codec;
     }
     TakeNamed(call.Parameter("codec"), "codec", base::VideoCodecWords(), camera.video_type);
     std::vector<std::string> addresses;

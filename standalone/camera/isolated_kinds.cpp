@@ -4,12 +4,8 @@
 namespace lookhaven::camera {
 
 media::SourceKinds IsolatedKinds() {
-    media::SourceKinds kinds = media::CameraKinds();
-    for (auto& [beginning, opener] : kinds) {
-        if (beginning.ends_with("://")) {
-            opener = OpenIsolated;
-        }
-    }
+    media::SourceKinds kinds = NetworkKinds();
+    kinds.merge(media::CameraKinds());
     return kinds;
 }
 

@@ -15,6 +15,7 @@
 #include "standalone/base/log.h"
 #include "standalone/camera/camera_process.h"
 #include "standalone/camera/message_reader.h"
+#include "standalone/media/source_kinds.h"
 
 namespace lookhaven::camera {
 
@@ -116,6 +117,14 @@ class IsolatedSource : public media::Source {
 std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media::SourceOptions& options,
                                             std::stop_token stop) {
     return std::make_unique<IsolatedSource>(url, options, std::move(stop));
+}
+
+media::SourceKinds NetworkKinds() {
+    media::SourceKinds kinds;
+    for (const media::NetworkKind& kind : media::kNetworkKinds) {
+        kinds.emplace(kind.beginning, OpenIsolated);
+    }
+    return kinds;
 }
 
 }  // namespace lookhaven::camera

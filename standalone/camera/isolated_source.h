@@ -15,12 +15,10 @@ namespace lookhaven::camera {
 std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media::SourceOptions& options,
                                             std::stop_token stop);
 
+// Those of the network, isolated; needs no libav.
+media::SourceKinds NetworkKinds();
+
 // media::CameraKinds, those of the network isolated.
 media::SourceKinds IsolatedKinds();
-
-// Those of the network alone, for a process without libav.
-inline media::SourceKinds NetworkKinds() {
-    return {{"rtsp://", OpenIsolated}, {"http://", OpenIsolated}, {"https://", OpenIsolated}};
-}
 
 }  // namespace lookhaven::camera

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Which kind of source a URL names; needs no libav.
-#include "standalone/media/source.h"
+#include <algorithm>
+
+#include "standalone/media/source_kinds.h"
 
 namespace lookhaven::media {
 
@@ -14,6 +16,12 @@ SourceOpener FindKind(const SourceKinds& kinds, std::string_view url) {
         }
     }
     return nullptr;
+}
+
+const NetworkKind* FindNetworkKind(std::string_view address) {
+    const auto* found = std::ranges::find_if(
+        kNetworkKinds, [address](const NetworkKind& kind) { return address.starts_with(kind.beginning); });
+    return found == kNetworkKinds.end() ? nullptr : found;
 }
 
 std::string ListKinds(const SourceKinds& kinds) {

@@ -6,6 +6,8 @@
 //   http://… https://…      Motion JPEG as a multipart response
 //   file:/path              a video file, played in a loop at its own pace
 //
+// source_kinds.h says how to add a kind.
+//
 // Thread safety: one thread per source; any number of sources.
 #pragma once
 
@@ -73,7 +75,7 @@ using SourceOpener = std::unique_ptr<Source> (*)(const std::string& url, const S
 // The kinds of source that a program knows, by how their URLs begin.
 using SourceKinds = std::map<std::string, SourceOpener>;
 
-// The table in source_kinds.cpp: "rtsp://", "http://", "https://" and "file:". A program may add others.
+// Those of source_kinds.h, and "file:". A program may add others.
 SourceKinds CameraKinds();
 
 // Null for a URL of no kind, or without a host where its kind has one.

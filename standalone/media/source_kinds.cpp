@@ -3,8 +3,26 @@
 
 namespace lookhaven::media {
 
+namespace {
+
+SourceOpener OpenerOf(Protocol protocol) {
+    switch (protocol) {
+    case Protocol::kRtsp:
+        return OpenRtsp;
+    case Protocol::kMjpegOverHttp:
+        return OpenMjpegHttp;
+    }
+    return nullptr;
+}
+
+}  // namespace
+
 SourceKinds CameraKinds() {
-    return {{"rtsp://", OpenRtsp}, {"http://", OpenMjpegHttp}, {"https://", OpenMjpegHttp}, {"file:", OpenFileLoop}};
+    SourceKinds kinds = {{"file:", OpenFileLoop}};
+    for (const NetworkKind& kind : kNetworkKinds) {
+        kinds.emplace(kind.beginning, OpenerOf(kind.protocol));
+    }
+    return kinds;
 }
 
 }  // namespace lookhaven::media
