@@ -33,9 +33,11 @@ std::string NetworkOf(std::string_view address) {
     return std::string(::inet_ntop(AF_INET6, &bytes, text, sizeof text)) + "/64";
 }
 
-void RefuseUnlessNow(int wait_s) {
+// secret: of which too many were tried. packaging/fail2ban knows the sentence.
+void RefuseUnlessNow(int wait_s, const std::string& secret) {
     if (wait_s > 0) {
-        throw Failure(429, "too many log-ins; try again in " + std::to_string(wait_s) + " seconds", wait_s);
+        const std::string when = "try again in " + std::to_string(wait_s) + " seconds";
+        throw Failure(429, "too many attempts with a " + secret + "; " + when, wait_s);
     }
 }
 
@@ -43,7 +45,7 @@ void RefuseUnlessNow(int wait_s) {
 
 HashingPlace::HashingPlace(const Call& call) : slot_(call.slot) {
     if (!call.slots.BeginHashing(slot_, kHashingLimits)) {
-        throw Failure(503, "too many log-ins at once; try again in a moment", http::kRetrySoonSeconds);
+        throw Failure(503, "too many passwords are being checked; try again in a moment", http::kRetrySoonSeconds);
     }
 }
 
@@ -54,9 +56,9 @@ HashingPlace::~HashingPlace() {
 store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password) {
     const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
     store::LoginThrottle throttle(call.Records());
-    RefuseUnlessNow(throttle.Wait(account, network, base::WallSeconds()));
+    RefuseUnlessNow(throttle.Wait(account, network, base::WallSeconds()), "password");
     const HashingPlace place(call);
-    RefuseUnlessNow(throttle.Enter(account, network, base::WallSeconds()));
+    RefuseUnlessNow(throttle.Enter(account, network, base::WallSeconds()), "password");
     const auto user = store::Users(call.Records()).CheckPassword(account, password);
     if (!user) {
         throw Failure(401, "wrong account or password");
@@ -89,8 +91,8 @@ void CheckSetupToken(const Call& call, const std::string& token) {
         // After the look at the token: whoever shares the owner's network must not keep the right one out.
         const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
         store::LoginThrottle throttle(call.Records());
-        RefuseUnlessNow(throttle.Wait(kSetup, network, base::WallSeconds()));
-        RefuseUnlessNow(throttle.Enter(kSetup, network, base::WallSeconds()));
+        RefuseUnlessNow(throttle.Wait(kSetup, network, base::WallSeconds()), "setup token");
+        RefuseUnlessNow(throttle.Enter(kSetup, network, base::WallSeconds()), "setup token");
         throw;
     }
 }

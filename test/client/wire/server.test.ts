@@ -25,7 +25,7 @@ test.each([
   ["no connection", cameras, lost, "The server does not answer.", false],
   ["a session that ended", cameras, () => json(401, failure(401)), "You are not logged in.", true],
   ["a wrong password, which ends no session", login, () => json(401, failure(401)), "The account or the password is wrong.", false],
-  ["throttled logins", login, () => json(429, failure(429, "too many log-ins")), "Too many attempts. Please wait a minute.", false],
+  ["throttled logins", login, () => json(429, failure(429, "too many attempts with a password; try again in 60 seconds")), "Too many attempts. Please wait a minute.", false],
   ["a server that has too much to do", cameras, () => json(429, failure(429, "try again in a moment")), "Try again in a moment.", false],
   ["a proxy that throttles", cameras, () => html(429), "Too many attempts. Please wait a minute.", false],
   ["a snapshot without picture", snapshot, () => json(504, failure(504)), "The camera sends no picture.", false],

@@ -103,6 +103,8 @@ TEST_F(FirstAccountApi, GuessesAreLimitedByNetworkAndHashNothing) {
         EXPECT_EQ(guess(wrong, "2001:db8::1"), 403);
     }
     EXPECT_EQ(guess(wrong, "2001:db8::2"), 429);
+    EXPECT_THAT(Log("refused-log-ins.log"), HasSubstr("too many attempts with a setup token; try again in "))
+        << "packaging/fail2ban looks for it";
     EXPECT_TRUE(users_.IsEmpty());
     EXPECT_EQ(guess(token, "2001:db8::3"), 200) << "a neighbour's guesses keep nobody out";
 }
