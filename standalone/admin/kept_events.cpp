@@ -17,7 +17,7 @@ namespace {
 // Null for what is not kept. Without the time: what is kept anew by the same keeper with the same note is as it was.
 Json::Value KeepingRecord(store::Store& store, int id) {
     const auto event = store::Events(store).Find(id);
-    if (!event || !event->archived) {
+    if (!event || !event->kept) {
         return {};
     }
     const store::Keeping keeping = store::KeptEvents(store).Find(id).value_or(store::Keeping());

@@ -68,20 +68,20 @@ Json::Value Describe(const store::Event& event) {
     json["frame_count"] = event.frame_count;
     json["record_type"] = event.reason;
     json["is_recording"] = event.recording;
-    json["archived"] = event.archived;
+    json["archived"] = event.kept;
     return json;
 }
 
 Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark) {
     Json::Value json = Describe(mark);
     const std::vector<store::Event> recordings = RecordingsOf(records, mark);
-    json["archived"] = !recordings.empty() && std::ranges::all_of(recordings, &store::Event::archived);
+    json["archived"] = !recordings.empty() && std::ranges::all_of(recordings, &store::Event::kept);
     return json;
 }
 
 Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event) {
     Json::Value json = Describe(event);
-    if (const auto keeping = event.archived ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
+    if (const auto keeping = event.kept ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
         AddKeeping(json, *keeping);
     }
     return json;
@@ -96,7 +96,7 @@ Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::
     const std::map<int, store::Keeping> keepings = store::KeptEvents(records).FindBetween(first.id, last.id);
     for (const store::Event& event : events) {
         Json::Value& each = json.append(Describe(event));
-        if (const auto keeping = keepings.find(event.id); event.archived && keeping != keepings.end()) {
+        if (const auto keeping = keepings.find(event.id); event.kept && keeping != keepings.end()) {
             AddKeeping(each, keeping->second);
         }
     }

@@ -77,7 +77,7 @@ Event PlatformEvent(const store::Event& from, const std::string& mount_path) {
     to.m_ImgH = from.height;
     to.m_blSaved = !from.demo;
     to.m_blRecording = from.recording;
-    to.m_blArchived = from.archived;
+    to.m_blArchived = from.kept;
     to.m_Size = static_cast<std::uint64_t>(from.size_bytes);
     to.m_Path = from.path;
     to.m_FullPath = FullPath(mount_path, from.path);

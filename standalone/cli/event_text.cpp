@@ -75,7 +75,7 @@ Json::Value ToData(const store::Event& event) {
                   event.start_s, "end", event.end_s, "recording", event.recording, "reason", event.reason,
                   "frame_count", event.frame_count, "size_bytes", event.size_bytes, "video_type",
                   static_cast<int>(event.video_type), "audio_codec", event.audio_codec, "width", event.width, "height",
-                  event.height, "path", event.path, "archived", event.archived, "demo", event.demo);
+                  event.height, "path", event.path, "archived", event.kept, "demo", event.demo);
 }
 
 Json::Value ToData(const store::Mark& mark, const store::TextQuery& words) {
@@ -105,7 +105,7 @@ std::string Description(const store::Event& event) {
                                                                          : Concat("reason ", event.reason);
     return Concat(
         "Event ", event.id, " of camera ", event.camera_id, ", ", reason, event.recording ? ", still recording" : "",
-        event.archived ? ", kept" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
+        event.kept ? ", kept" : "", event.demo ? ", generated" : "", "\nfrom   ", FormatMoment(event.start_s),
         "\nto     ", FormatMoment(event.end_s), "\nvideo  ", base::CodecTitle(event.video_type), " ", event.width, "x",
         event.height, ", ", event.frame_count, " frames\naudio  ",
         event.audio_codec.empty() ? "none" : event.audio_codec, "\nsize   ", FormatSize(event.size_bytes), "\n");

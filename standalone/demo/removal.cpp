@@ -35,7 +35,7 @@ RemovalResult Remove(store::Store& store, const std::filesystem::path& home) {
     RemovalResult result;
     events.Visit({.camera_ids = cameras}, [&](const store::Event& event) {
         result.growing += event.recording ? 1 : 0;
-        if (!event.archived && !event.demo) {
+        if (!event.kept && !event.demo) {
             ids.push_back(event.id);
         }
     });

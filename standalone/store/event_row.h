@@ -17,7 +17,7 @@ struct Mapping<Event> {
     static auto Members(auto& event) {
         return std::tie(event.id, event.camera_id, event.mount_id, event.start_s, event.end_s, event.recording,
                         event.reason, event.frame_count, event.size_bytes, event.video_type, event.audio_codec,
-                        event.width, event.height, event.path, event.archived, event.demo, event.order);
+                        event.width, event.height, event.path, event.kept, event.demo, event.order);
     }
 };
 

@@ -43,9 +43,9 @@ struct Event {
     std::string audio_codec;  // empty when silent
     int width = 0;
     int height = 0;
-    std::string path;       // relative to the mount
-    bool archived = false;  // kept: retention leaves it alone (kept_events.h)
-    bool demo = false;      // demo data: there is no file
+    std::string path;   // relative to the mount
+    bool kept = false;  // retention leaves it alone (kept_events.h); "archived" in its row and on the wire
+    bool demo = false;  // demo data: there is no file
     // Lower is earlier, whatever the clock said. Its id, but for old recordings that got a new id; kOrderOfId until the
     // row is stored.
     std::int64_t order = kOrderOfId;
@@ -175,7 +175,7 @@ class Events {
     // Growing events too, without demo ones, by camera. Reads a row for each event since then, and none before.
     std::vector<RecentFootage> RecordedSince(std::int64_t from_s);
     // What of that many UTC days, the first of which begins then, is left on the mount: bytes a day of finished events
-    // that are not archived, as far as the order of recording tells days apart. Reads the index alone.
+    // that are not kept, as far as the order of recording tells days apart. Reads the index alone.
     std::vector<std::int64_t> BytesByDay(int mount_id, std::int64_t first_day_s, int days);
     // When the event began that was recorded to the mount first; nothing when there is none.
     std::optional<std::int64_t> OldestOn(int mount_id);

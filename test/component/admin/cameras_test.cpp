@@ -41,11 +41,11 @@ class CameraChangeTest : public store::StoreTest {
 
     store::AuditEntry LastChange() { return store::AuditLog(store_).List(0, 1).at(0); }
 
-    int AddEvent(int camera, bool recording, bool archived) {
+    int AddEvent(int camera, bool recording, bool is_kept) {
         store::Events events(store_);
         store::Event event;
         event.id = events.NextId();
-        event.camera_id = camera, event.mount_id = 1, event.recording = recording, event.archived = archived;
+        event.camera_id = camera, event.mount_id = 1, event.recording = recording, event.kept = is_kept;
         events.Begin(event);
         return event.id;
     }
@@ -152,11 +152,11 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     const int removed = AddGate();
     const int other = AddEvent(kept, false, false);
     AddEvent(removed, false, false);
-    const int archived = AddEvent(removed, false, true);
+    const int spared = AddEvent(removed, false, true);
     const int growing = AddEvent(removed, true, false);
-    std::vector<store::Event> many(2'500, *store::Events(store_).Find(archived));
+    std::vector<store::Event> many(2'500, *store::Events(store_).Find(spared));
     for (std::size_t i = 0; i < many.size(); ++i) {
-        many[i].archived = false;
+        many[i].kept = false;
         many[i].demo = i >= 1'500;
         many[i].start_s = many[i].end_s = static_cast<std::int64_t>(i);
     }
@@ -173,7 +173,7 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
         RemoveCamera(store_, {}, removed, std::nullopt, Footage::kRemove);
     }
     store::Events events(store_);
-    EXPECT_TRUE(events.Find(other) && events.Find(archived));
+    EXPECT_TRUE(events.Find(other) && events.Find(spared));
     EXPECT_FALSE(events.Find(growing)) << "what was being recorded goes, too";
     EXPECT_EQ(events.PendingDeletion(1).size(), 1'502);
     EXPECT_EQ(events.List({.camera_ids = {removed}, .begin_s = -1}).size(), 1)
@@ -186,7 +186,7 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     events.Finish(late, 1, 1, 1);
     removals.BeginDeletions();
     EXPECT_FALSE(events.Find(late));
-    EXPECT_TRUE(events.Find(other) && events.Find(archived));
+    EXPECT_TRUE(events.Find(other) && events.Find(spared));
     const int present = AddGate();
     const int its = AddEvent(present, false, false);
     removals.Add(present, base::WallSeconds());

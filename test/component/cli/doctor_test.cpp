@@ -220,7 +220,7 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
              Sql("update mounts set max_bytes = 10")();
              store::Store store = Open();
              store::Event event;
-             event.camera_id = 1, event.mount_id = 2, event.size_bytes = 10, event.archived = true;
+             event.camera_id = 1, event.mount_id = 2, event.size_bytes = 10, event.kept = true;
              store::Events(store).AddAll(std::vector{event});
          },
          "whatever else is recorded is deleted at once", [&] { EXPECT_EQ(Run("mount set 2 --limit 1G").code, 0); }},

@@ -31,7 +31,7 @@ class EventTest : public RandomRecords {
         event.width = Draw(16, 8192);
         event.height = Draw(16, 8192);
         event.path = "1/'x\";--/" + std::to_string(Draw(0, 999));
-        event.archived = Draw(0, 4) == 0;
+        event.kept = Draw(0, 4) == 0;
         event.demo = Draw(0, 4) == 0;
         return event;
     }
@@ -98,7 +98,7 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         events_.VisitMount(mount, [&](const Event& event) { visited.push_back(*events_.Find(event.id)); });
         std::ranges::stable_sort(rows, {}, &Event::camera_id);
         EXPECT_EQ(visited, rows) << mount;
-        std::erase_if(rows, [](const Event& event) { return event.recording || event.archived; });
+        std::erase_if(rows, [](const Event& event) { return event.recording || event.kept; });
         std::ranges::sort(rows, {}, &Event::id);
         EXPECT_EQ(events_.InRecordingOrder(mount, {}, 1000), rows) << mount;
     }
@@ -112,7 +112,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     event.id = events_.NextId();
     event.end_s = event.start_s;
     event.recording = true;
-    event.demo = event.archived = false;
+    event.demo = event.kept = false;
     events_.Begin(event);
     EXPECT_THROW(events_.Begin(event), AlreadyExists);
     EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
