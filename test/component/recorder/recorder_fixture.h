@@ -21,6 +21,9 @@
 
 namespace lookhaven::test {
 
+// A source that costs little.
+constexpr const char* kSmallPattern = "test:mjpeg?size=160x120&fps=25";
+
 // A program that dies with the test.
 class Child {
   public:

@@ -111,7 +111,7 @@ class RecordingTest : public RecorderTest, public testing::WithParamInterface<st
 };
 
 TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
-    for (const char* source : {"test:mjpeg?size=160x120&fps=25", "test:h264?size=160x120&fps=25&gop=25&audio=aac"}) {
+    for (const char* source : {kSmallPattern, "test:h264?size=160x120&fps=25&gop=25&audio=aac"}) {
         SetPlan(AddCamera(source), store::RecordMode::kAlways);
     }
     std::mt19937 random(7);
@@ -155,7 +155,7 @@ TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
 
 TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
     for (const store::RecordMode mode : {store::RecordMode::kAlways, store::RecordMode::kNever}) {
-        const int camera = AddCamera("test:mjpeg?size=160x120&fps=25");
+        const int camera = AddCamera(kSmallPattern);
         SetPlan(camera, mode);
         const Child recorder = StartRecorder();
         const std::string live = "camera " + std::to_string(camera) + " \"Camera\" stream 0: live";

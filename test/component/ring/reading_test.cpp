@@ -1,79 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What one reader sees: the order of entries, where it continues after a gap, how it waits, what stays while it sends.
-#include <atomic>
-#include <csignal>
-#include <optional>
-#include <thread>
+// What one reader sees: the order of entries, where it continues after a gap, what stays while it sends.
+#include <vector>
 
-#include <gmock/gmock.h>
-#include <pthread.h>
-#include <sys/resource.h>
-#include <sys/shm.h>
-
-#include "standalone/base/clock.h"
-#include "test/component/ring/ring_fixture.h"
-#include "test/support/wait.h"
+#include "test/component/ring/reading_fixture.h"
 
 namespace lookhaven::ring {
 namespace {
-
-const StreamId kVideo{7, 1, Medium::kVideo};
-const StreamId kAudio{7, 1, Medium::kAudio};
-
-class ReadingTest : public RingTest {
-  protected:
-    void Open(const StreamId& id, const StreamFormat& format, const Geometry& geometry) {
-        writer_.emplace(installation_, id, format, geometry);
-        ring_ = Attach(installation_, id);
-        ASSERT_NE(ring_, nullptr);
-        StartRead(ring_, &position_);
-    }
-    // Opens the stream's other ring, too, which reads of the first one wait for.
-    void OpenSound() {
-        sound_writer_.emplace(installation_, kAudio, StreamFormat{"AAC", {}, 0, 0, true}, kSmall);
-        sound_ = {Attach(installation_, kAudio), &sound_position_};
-        StartRead(sound_.ring, &sound_position_);
-    }
-    void WriteSound() { sound_writer_->Write({.data = MakeData(64, 1)}); }
-    void TearDown() override {
-        Detach(ring_);
-        Detach(sound_.ring);
-        writer_.reset();
-        sound_writer_.reset();
-    }
-
-    // The frame's data follows from its count.
-    bool Write(std::size_t size_bytes = 64, bool is_key = true) {
-        const auto data = MakeData(size_bytes, written_ + 1);
-        const bool done = writer_->Write({.data = data, .is_key = is_key, .timestamp_micros = 1, .capture_millis = 2});
-        written_ += done ? 1 : 0;
-        return done;
-    }
-    // Writes key and other frames as the letters say: K, p.
-    void WriteGroup(std::string_view kinds) {
-        for (const char kind : kinds) {
-            ASSERT_TRUE(Write(64, kind == 'K'));
-        }
-    }
-    static std::uint64_t CountOf(const Entry* entry) { return entry == nullptr ? 0 : entry->Count(); }
-    // Reads and releases at once.
-    std::uint64_t Next(int last) { return Released(ReadNext(ring_, last, &position_)); }
-    std::uint64_t Latest(int last) { return Released(ReadLatest(ring_, last, &position_, 0)); }
-    std::uint64_t Released(const Entry* entry) {
-        const std::uint64_t count = CountOf(entry);
-        ReadFinish(ring_, entry, &position_);
-        return count;
-    }
-
-    std::optional<Writer> writer_;
-    void* ring_ = nullptr;
-    Position position_;
-    std::optional<Writer> sound_writer_;
-    Position sound_position_;
-    SecondReader sound_;
-    std::uint64_t written_ = 0;
-};
 
 TEST_F(ReadingTest, NumbersRunToTenThousandAndBeginAgainWithoutAGapForTheReader) {
     Open(kVideo, kMjpeg, kSmall);
@@ -187,100 +120,6 @@ TEST_F(ReadingTest, EntriesWithoutAPositionAreHeldUntilTheyAreReleasedAndTakeNoS
     StopRead(ring_, &position_);
     EXPECT_EQ(ListSegments(installation_)[0].readers, 0U);
     EXPECT_EQ(Latest(kNoSequence), 0U) << "a position that has stopped reads nothing";
-}
-
-TEST_F(ReadingTest, AWaitEndsWithItsTimeAndSleeps) {
-    Open(kVideo, kMjpeg, kSmall);
-    OpenSound();
-    ASSERT_TRUE(Write());
-    enum Read { kLatest, kNext, kNextOfSilent, kNextBesideUnreadSound };
-    struct Row {
-        const char* name;
-        Read read;
-        int wait_ms;
-        int min_ms;
-        int sleeps;
-    };
-    // Far above what a busy machine adds, far below what a wait of the whole time or without an end would take.
-    constexpr int kMaxMs = 30'000;
-    for (const Row& row :
-         {Row{"time", kLatest, 60, 60, 1}, Row{"longest time", kLatest, 120'000, 100, 1},
-          Row{"no wait", kLatest, 0, 0, 0}, Row{"of both rings", kNext, 60, 60, 1},
-          Row{"of a silent stream", kNextOfSilent, 60, 60, 1},
-          Row{"of both rings, longest time", kNext, 120'000, 100, 1}, Row{"no wait of both rings", kNext, 0, 0, 0},
-          Row{"sound goes first", kNextBesideUnreadSound, 120'000, 0, 0}}) {
-        SCOPED_TRACE(row.name);
-        rusage before{};
-        ::getrusage(RUSAGE_THREAD, &before);
-        const std::int64_t begin = base::MonotonicMicros();
-        if (row.read == kNextBesideUnreadSound) {
-            WriteSound();
-        }
-        const SecondReader sound = row.read == kNextOfSilent ? SecondReader{} : sound_;
-        EXPECT_EQ(row.read == kLatest ? ReadLatest(ring_, 0, &position_, row.wait_ms)
-                                      : ReadNext(ring_, 0, &position_, sound, row.wait_ms),
-                  nullptr);
-        const std::int64_t took_ms = (base::MonotonicMicros() - begin) / 1000;
-        rusage after{};
-        ::getrusage(RUSAGE_THREAD, &after);
-        EXPECT_GE(took_ms, row.min_ms);
-        EXPECT_LT(took_ms, kMaxMs);
-        EXPECT_GE(after.ru_nvcsw - before.ru_nvcsw, row.sleeps) << "it spins";
-        EXPECT_LE(after.ru_nvcsw - before.ru_nvcsw, row.sleeps + 5) << "it polls";
-    }
-}
-
-TEST_F(ReadingTest, AFrameASoundAndASignalEndAWait) {
-    Open(kVideo, kMjpeg, kSmall);
-    OpenSound();
-    ASSERT_TRUE(Write());
-    static std::atomic<int> signals{0};
-    struct sigaction interrupt {};
-    interrupt.sa_handler = [](int) { ++signals; };
-    ::sigaction(SIGUSR1, &interrupt, nullptr);
-    // A wait may time out before the test sees it: the frame then ends a later one, the signal none.
-    int interrupted = 0;
-    for (int round = 0; round < 40 || interrupted < 2; ++round) {
-        const bool by_frame = round % 2 == 0;
-        const bool of_both = round % 4 >= 2;
-        const bool by_sound = by_frame && of_both && round % 8 >= 4;
-        const SecondReader sound = round % 16 / 2 == 1 ? SecondReader{} : sound_;
-        const int last = static_cast<int>(written_) - 1;
-        std::atomic<pid_t> thread{0};
-        std::atomic<bool> is_done{false};
-        signals = 0;
-        std::thread reader([&] {
-            thread = ::gettid();
-            const Entry* entry = nullptr;
-            do {
-                entry = of_both ? ReadNext(ring_, last, &position_, sound) : ReadLatest(ring_, last, &position_);
-                if (by_sound && entry == nullptr) {
-                    entry =
-                        ReadNext(sound_.ring,
-                                 sound_position_.count == 0 ? kNoSequence : static_cast<int>(sound_position_.count) - 1,
-                                 &sound_position_);
-                }
-            } while (by_frame && entry == nullptr);
-            is_done = true;
-            EXPECT_EQ(entry != nullptr, by_frame);
-            ReadFinish(ring_, entry, &position_);
-            ReadFinish(sound_.ring, entry, &sound_position_);
-        });
-        const auto sleeps = [&] { return thread != 0 && test::IsAsleep(thread) && !is_done; };
-        if (by_frame) {
-            EXPECT_TRUE(test::Eventually(sleeps));
-            by_sound ? WriteSound() : void(Write());
-            EXPECT_FALSE(sleeps()) << "the frame does not wake it";
-        }
-        while (!is_done) {
-            if (!by_frame && sleeps()) {
-                ::pthread_kill(reader.native_handle(), SIGUSR1);
-            }
-        }
-        reader.join();
-        EXPECT_LE(signals, 1) << "it goes on sleeping after a signal";
-        interrupted += signals;
-    }
 }
 
 TEST_F(ReadingTest, AForkedChildReadsNothingThroughItsParentsPositionAndLeavesItsPinAlone) {
