@@ -21,8 +21,8 @@
 //     settings/   the sections of the settings: cameras and their groups, maps, accounts, storage, audit. Most have a list
 //                 and a page of one record (record_page), whose form (record_form) notices what others have changed
 //                 meanwhile (merge, conflict_panel)
-//     widgets/    what all of these use: elements, buttons, icons, fields, dialogs, texts, titles, notices, keys, panning and
-//                 zooming
+//     widgets/    what all of these use: elements, buttons, icons, fields, credentials, dialogs, texts, titles, notices, keys,
+//                 panning and zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
 //
 // ui may use live, playback and wire; live and playback use wire. Nothing here writes markup from text (see dom), and the page

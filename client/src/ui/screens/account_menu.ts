@@ -5,21 +5,13 @@
 import { Accounts } from "../../wire/accounts";
 import { ServerError } from "../../wire/server";
 import { iconButton } from "../widgets/button";
+import { passwordProblem } from "../widgets/credentials";
 import { element } from "../widgets/dom";
 import { secretField } from "../widgets/fields";
 import { openDialog } from "../widgets/form_dialog";
 import { icon, type IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";
 import type { Session } from "./session";
-
-const kMinPasswordBytes = 8;
-
-/** A sentence where a new password that was typed twice cannot be taken. */
-export function passwordProblem(password: string, again: string): string {
-  const isShort = new TextEncoder().encode(password).length < kMinPasswordBytes;
-  if (isShort) return `A password has at least ${kMinPasswordBytes} characters.`;
-  return password === again ? "" : "The two new passwords are not the same.";
-}
 
 export class AccountMenu {
   readonly button: HTMLButtonElement;

@@ -4,12 +4,9 @@
 // else how to get such an address.
 
 import { asServerError, type Account, type Server } from "../../wire/server";
+import { accountNameProblem, passwordProblem } from "../widgets/credentials";
 import { element } from "../widgets/dom";
-import { passwordProblem } from "./account_menu";
 import { brand, credentialField } from "./login_screen";
-
-const kName = /^[A-Za-z0-9][A-Za-z0-9._@-]{0,63}$/;
-const kNameRule = "A name has up to 64 letters, digits and . _ @ -, and begins with a letter or digit.";
 
 /** What the screen does next. */
 export interface SetupOutcome {
@@ -42,7 +39,8 @@ export function setupScreen(server: Server, token: () => string | null, outcome:
 
   const problem = (): readonly [sentence: string, at: HTMLInputElement] | null => {
     if (!name.input.value) return ["Please choose a name for the account.", name.input];
-    if (!kName.test(name.input.value)) return [kNameRule, name.input];
+    const ofName = accountNameProblem(name.input.value);
+    if (ofName) return [ofName, name.input];
     const sentence = passwordProblem(password.input.value, again.input.value);
     return sentence ? [sentence, password.input] : null;
   };

@@ -3,7 +3,7 @@
 // The settings of an account as fields: its name, password, privilege and rights.
 
 import type { UserList, UserRecord, UserSettings } from "../../../wire/accounts";
-import { passwordProblem } from "../../screens/account_menu";
+import { accountNameProblem, passwordProblem } from "../../widgets/credentials";
 import { element } from "../../widgets/dom";
 import { checkField, formPart, formRow, radioField, secretField, textField, type Field, type TextField } from "../../widgets/fields";
 import type { RecordFields } from "../record_page";
@@ -63,8 +63,8 @@ export class AccountFields implements RecordFields<AccountSettings> {
   }
 
   problem({ name }: AccountSettings): string {
-    const isName = /^[A-Za-z0-9][A-Za-z0-9._@-]{0,63}$/.test(name);
-    if (!isName) return "The name begins with a letter or digit, and has letters, digits and . _ - @ only.";
+    const ofName = accountNameProblem(name);
+    if (ofName) return ofName;
     if (!this.hasSecrets) return this.#isNew ? "Please choose a password." : "";
     return passwordProblem(this.#password.value, this.#again.value);
   }
