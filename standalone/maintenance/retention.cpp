@@ -19,7 +19,9 @@ constexpr std::int64_t kFilesOfEvent = 2;  // with its index
 // So many events with dates in the future are looked past.
 constexpr std::size_t kMaxMisdated = 10'000;
 
-bool IsOlderThanLimit(const store::Mount& mount, const store::Event& event, std::int64_t now_s) {
+// By the age limit. Both walks below go in the order of recording and stop at the first event that is not, so the limit
+// must be the same for all of a mount; one of a camera needs walks of its own.
+bool IsExpired(const store::Mount& mount, const store::Event& event, std::int64_t now_s) {
     return mount.max_age_s > 0 && event.end_s <= now_s - mount.max_age_s;
 }
 
@@ -88,7 +90,7 @@ class Retention {
             has_more = oldest.size() == kEventsAtOnce;
             for (const store::Event& event : oldest) {
                 after = event;
-                if (IsInExcess(event) || IsExpired(event)) {
+                if (TakeFromExcess(event) || (has_age_limit_ && IsExpired(mount_, event, now_s_))) {
                     std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
                     chosen.push_back(event);
                 } else if (has_age_limit_ && event.end_s > now_s_) {
@@ -121,18 +123,12 @@ class Retention {
         return space.free_files == 0 && folder_.TakesAnotherFile() ? 0 : 3 * space.ReserveFiles() - space.free_files;
     }
 
-    // Of what precedes it, all is in excess.
-    bool IsInExcess(const store::Event& event) {
+    // Whether it must go, after all that precede it, for lack of room; counts it either way.
+    bool TakeFromExcess(const store::Event& event) {
         const bool is_in_excess = chosen_bytes_ < excess_bytes_ || chosen_files_ < excess_files_;
         chosen_bytes_ += event.size_bytes;
         chosen_files_ += kFilesOfEvent;
         return is_in_excess;
-    }
-
-    // The age limit. DeleteOldest stops at the first event that is not expired, so the limit must be the same for all
-    // of a mount.
-    bool IsExpired(const store::Event& event) const {
-        return has_age_limit_ && IsOlderThanLimit(mount_, event, now_s_);
     }
 
     const store::Mount& mount_;
@@ -161,7 +157,7 @@ RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mou
         const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsAtOnce);
         for (const store::Event& event : oldest) {
             after = event;
-            const bool is_deleted = bytes < excess_bytes || IsOlderThanLimit(mount, event, now_s);
+            const bool is_deleted = bytes < excess_bytes || IsExpired(mount, event, now_s);
             const bool may_be_deleted = mount.max_age_s > 0 && event.end_s > now_s;
             if (!is_deleted && !may_be_deleted) {
                 return forecast;
