@@ -15,15 +15,15 @@ namespace lookhaven::admin {
 namespace {
 
 // Null for what is not kept. Without the time: what is kept anew by the same keeper with the same note is as it was.
-Json::Value KeepingRecord(store::Store& store, int id) {
+Json::Value AuditedKeepRecord(store::Store& store, int id) {
     const auto event = store::Events(store).Find(id);
     if (!event || !event->kept) {
         return {};
     }
-    const store::Keeping keeping = store::KeptEvents(store).Find(id).value_or(store::Keeping());
+    const store::KeepRecord record = store::KeptEvents(store).Find(id).value_or(store::KeepRecord());
     Json::Value json;
-    json["note"] = keeping.note;
-    json["keeper"] = keeping.keeper;
+    json["note"] = record.note;
+    json["keeper"] = record.keeper;
     return json;
 }
 
@@ -40,9 +40,9 @@ int ChangeEach(store::Store& store, const Actor& actor, const char* action, cons
     store::InTransaction(store, [&] {
         for (const int id : ids) {
             Apply(store, actor, [&] {
-                const Json::Value before = KeepingRecord(store, id);
+                const Json::Value before = AuditedKeepRecord(store, id);
                 changed += make(std::array{id});
-                return Change{action, NameOf(store, id), before, KeepingRecord(store, id)};
+                return Change{action, NameOf(store, id), before, AuditedKeepRecord(store, id)};
             });
         }
     });
@@ -52,9 +52,9 @@ int ChangeEach(store::Store& store, const Actor& actor, const char* action, cons
 }  // namespace
 
 int KeepEvents(store::Store& store, const Actor& actor, const std::vector<int>& ids, const std::string& note) {
-    const store::Keeping keeping{note, actor.user_id == 0 ? "" : actor.name, base::WallSeconds()};
+    const store::KeepRecord record{note, actor.user_id == 0 ? "" : actor.name, base::WallSeconds()};
     return ChangeEach(store, actor, "event.keep", ids,
-                      [&](const auto& id) { return store::KeptEvents(store).Keep(id, keeping); });
+                      [&](const auto& id) { return store::KeptEvents(store).Keep(id, record); });
 }
 
 int ReleaseEvents(store::Store& store, const Actor& actor, const std::vector<int>& ids) {

@@ -32,10 +32,10 @@ Json::Value PiecesOf(const std::vector<std::vector<std::string>>& lines) {
     return json;
 }
 
-void AddKeeping(Json::Value& json, const store::Keeping& keeping) {
-    json["note"] = keeping.note;
-    json["kept_by"] = keeping.keeper;
-    json["kept"] = Json::Int64{keeping.kept_s};
+void AddKeepRecord(Json::Value& json, const store::KeepRecord& record) {
+    json["note"] = record.note;
+    json["kept_by"] = record.keeper;
+    json["kept"] = Json::Int64{record.kept_s};
 }
 
 }  // namespace
@@ -81,8 +81,8 @@ Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark) 
 
 Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event) {
     Json::Value json = Describe(event);
-    if (const auto keeping = event.kept ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
-        AddKeeping(json, *keeping);
+    if (const auto record = event.kept ? store::KeptEvents(records).Find(event.id) : std::nullopt) {
+        AddKeepRecord(json, *record);
     }
     return json;
 }
@@ -93,11 +93,11 @@ Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::
         return json;
     }
     const auto [first, last] = std::ranges::minmax(events, {}, &store::Event::id);
-    const std::map<int, store::Keeping> keepings = store::KeptEvents(records).FindBetween(first.id, last.id);
+    const std::map<int, store::KeepRecord> keep_records = store::KeptEvents(records).FindBetween(first.id, last.id);
     for (const store::Event& event : events) {
         Json::Value& each = json.append(Describe(event));
-        if (const auto keeping = keepings.find(event.id); event.kept && keeping != keepings.end()) {
-            AddKeeping(each, keeping->second);
+        if (const auto record = keep_records.find(event.id); event.kept && record != keep_records.end()) {
+            AddKeepRecord(each, record->second);
         }
     }
     return json;

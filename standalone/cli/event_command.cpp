@@ -150,11 +150,11 @@ void Show(const Console& console, const Request& request) {
     data["file"] = file.string();
     data["file_readable"] = exists;
     std::string text = found.event ? Description(*found.event) : Description(*found.mark);
-    if (const auto keeping = store::KeptEvents(store).Find(request.id)) {
-        data["note"] = keeping->note;
-        data["kept_by"] = keeping->keeper;
-        data["kept"] = Json::Int64{keeping->kept_s};
-        text += Description(*keeping);
+    if (const auto record = store::KeptEvents(store).Find(request.id)) {
+        data["note"] = record->note;
+        data["kept_by"] = record->keeper;
+        data["kept"] = Json::Int64{record->kept_s};
+        text += Description(*record);
     }
     if (!file.empty()) {
         text += "file   " + file.string() + (exists ? "" : " (cannot be read)") + "\n";

@@ -111,10 +111,10 @@ std::string Description(const store::Event& event) {
         event.audio_codec.empty() ? "none" : event.audio_codec, "\nsize   ", FormatSize(event.size_bytes), "\n");
 }
 
-std::string Description(const store::Keeping& keeping) {
-    return Concat("kept   by ", keeping.keeper.empty() ? "the command line" : keeping.keeper,
-                  keeping.kept_s == 0 ? "" : ", " + FormatMoment(keeping.kept_s),
-                  keeping.note.empty() ? "" : ": " + keeping.note, "\n");
+std::string Description(const store::KeepRecord& record) {
+    return Concat("kept   by ", record.keeper.empty() ? "the command line" : record.keeper,
+                  record.kept_s == 0 ? "" : ", " + FormatMoment(record.kept_s),
+                  record.note.empty() ? "" : ": " + record.note, "\n");
 }
 
 std::string Description(const store::Mark& mark) {

@@ -25,6 +25,6 @@ std::string MarkTable(const Json::Value& marks);
 // The record in several lines.
 std::string Description(const store::Event& event);
 std::string Description(const store::Mark& mark);
-std::string Description(const store::Keeping& keeping);
+std::string Description(const store::KeepRecord& record);
 
 }  // namespace lookhaven::cli

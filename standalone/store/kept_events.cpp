@@ -11,14 +11,14 @@
 namespace lookhaven::store {
 
 template <>
-struct Mapping<Keeping> {
+struct Mapping<KeepRecord> {
     static constexpr const char* kTable = "kept_events";
     static constexpr const char* kColumns = "note, keeper, kept_s";
-    static auto Members(auto& keeping) { return std::tie(keeping.note, keeping.keeper, keeping.kept_s); }
+    static auto Members(auto& record) { return std::tie(record.note, record.keeper, record.kept_s); }
 };
 
-int KeptEvents::Keep(std::span<const int> event_ids, const Keeping& keeping) {
-    if (!IsPlainText(keeping.note, kMaxKeepNoteBytes)) {
+int KeptEvents::Keep(std::span<const int> event_ids, const KeepRecord& record) {
+    if (!IsPlainText(record.note, kMaxKeepNoteBytes)) {
         throw InvalidRecord("a note is UTF-8 without control characters, at most 500 bytes");
     }
     return connection_.Write([&](soci::session& sql) {
@@ -29,7 +29,7 @@ int KeptEvents::Keep(std::span<const int> event_ids, const Keeping& keeping) {
                 Execute(sql,
                         "insert into kept_events (event_id, note, keeper, kept_s)"
                         " values (:id, :note, :keeper, :kept)",
-                        id, keeping.note, keeping.keeper, keeping.kept_s);
+                        id, record.note, record.keeper, record.kept_s);
                 ++kept;
             }
         }
@@ -48,12 +48,12 @@ int KeptEvents::Release(std::span<const int> event_ids) {
     });
 }
 
-std::optional<Keeping> KeptEvents::Find(int event_id) {
-    return connection_.FetchOne<Keeping>("where event_id = :id", event_id);
+std::optional<KeepRecord> KeptEvents::Find(int event_id) {
+    return connection_.FetchOne<KeepRecord>("where event_id = :id", event_id);
 }
 
-std::map<int, Keeping> KeptEvents::FindBetween(int first_event_id, int last_event_id) {
-    return connection_.FetchAll<std::pair<int, Keeping>, std::map<int, Keeping>>(
+std::map<int, KeepRecord> KeptEvents::FindBetween(int first_event_id, int last_event_id) {
+    return connection_.FetchAll<std::pair<int, KeepRecord>, std::map<int, KeepRecord>>(
         "select event_id, note, keeper, kept_s from kept_events where event_id >= :first and event_id <= :last",
         first_event_id, last_event_id);
 }

@@ -16,12 +16,12 @@ namespace lookhaven::store {
 constexpr std::size_t kMaxKeepNoteBytes = 500;
 
 // Why an event is kept, and who says so.
-struct Keeping {
+struct KeepRecord {
     std::string note;         // one line, may be empty
     std::string keeper;       // the account's name at that time; empty for the command line
     std::int64_t kept_s = 0;  // 0: not known
 
-    friend bool operator==(const Keeping&, const Keeping&) = default;
+    friend bool operator==(const KeepRecord&, const KeepRecord&) = default;
 };
 
 class KeptEvents {
@@ -32,13 +32,13 @@ class KeptEvents {
     // Of those of the events that exist, growing ones too; one that is kept already gets the new note and keeper. Each
     // is one transaction and returns how many there were: an event that retention is deleting is not among them. Keep
     // throws InvalidRecord.
-    int Keep(std::span<const int> event_ids, const Keeping& keeping);
+    int Keep(std::span<const int> event_ids, const KeepRecord& record);
     int Release(std::span<const int> event_ids);
 
     // Nothing for an event that is not kept.
-    std::optional<Keeping> Find(int event_id);
+    std::optional<KeepRecord> Find(int event_id);
     // By event id, of the kept events with first <= id <= last.
-    std::map<int, Keeping> FindBetween(int first_event_id, int last_event_id);
+    std::map<int, KeepRecord> FindBetween(int first_event_id, int last_event_id);
     // What kept events take of the mount.
     std::int64_t SizeBytes(int mount_id);
 

@@ -144,7 +144,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     KeptEvents kept(store_);
     EXPECT_EQ(kept.Keep(std::array{event.id, unknown}, {"first", "guest", 4}), 1);
     EXPECT_EQ(kept.Keep(std::array{event.id}, {"it's theirs", "admin", 5}), 1);
-    EXPECT_EQ(kept.Find(event.id), (Keeping{"it's theirs", "admin", 5}));
+    EXPECT_EQ(kept.Find(event.id), (KeepRecord{"it's theirs", "admin", 5}));
     EXPECT_THROW(kept.Keep(std::array{event.id}, {"a\nb", "", 0}), InvalidRecord);
     EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty());
     events_.BeginDeletion(std::array{event.id});
