@@ -43,13 +43,13 @@ void RefuseUnlessNow(int wait_s, const std::string& secret) {
 
 }  // namespace
 
-HashingPlace::HashingPlace(const Call& call) : slot_(call.slot) {
+HashingPermit::HashingPermit(const Call& call) : slot_(call.slot) {
     if (!call.slots.BeginHashing(slot_, kHashingLimits)) {
         throw Failure(503, "too many passwords are being checked; try again in a moment", http::kRetrySoonSeconds);
     }
 }
 
-HashingPlace::~HashingPlace() {
+HashingPermit::~HashingPermit() {
     control::SlotTable::EndHashing(slot_);
 }
 
@@ -57,7 +57,7 @@ store::VerifiedUser CheckPassword(const Call& call, const std::string& account, 
     const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
     store::LoginThrottle throttle(call.Records());
     RefuseUnlessNow(throttle.Wait(account, network, base::WallSeconds()), "password");
-    const HashingPlace place(call);
+    const HashingPermit permit(call);
     RefuseUnlessNow(throttle.Enter(account, network, base::WallSeconds()), "password");
     const auto user = store::Users(call.Records()).CheckPassword(account, password);
     if (!user) {
@@ -104,7 +104,7 @@ std::string RequireNewPassword(const Call& call, const std::string& parameter) {
 }
 
 store::HashedPassword Hash(const Call& call, const std::string& password) {
-    const HashingPlace place(call);
+    const HashingPermit permit(call);
     return store::HashedPassword(password);
 }
 

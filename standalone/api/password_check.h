@@ -12,13 +12,13 @@
 namespace lookhaven::api {
 
 // Whoever checks or hashes a password on request holds this meanwhile; one at a time in a process.
-class HashingPlace {
+class HashingPermit {
   public:
     // Throws Failure 503 when there is none.
-    explicit HashingPlace(const Call& call);
-    ~HashingPlace();
-    HashingPlace(const HashingPlace&) = delete;
-    HashingPlace& operator=(const HashingPlace&) = delete;
+    explicit HashingPermit(const Call& call);
+    ~HashingPermit();
+    HashingPermit(const HashingPermit&) = delete;
+    HashingPermit& operator=(const HashingPermit&) = delete;
 
   private:
     control::Slot& slot_;
