@@ -19,6 +19,7 @@
 #include "standalone/api/player.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
+#include "standalone/base/sanitizers.h"
 #include "standalone/binding/rights.h"
 #include "standalone/emap/map_picture.h"
 #include "standalone/http/body.h"
@@ -37,16 +38,10 @@ constexpr std::size_t kMaxBody = std::size_t{1} << 20;
 constexpr const char* kManagersOnly = "only a manager may do this";
 constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
 
-// Under a sanitizer a process maps terabytes before main.
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kLimitAddressSpace = false;
-#else
-constexpr bool kLimitAddressSpace = true;
-#endif
-
+// Not under a sanitizer, which maps terabytes before main.
 void LimitAddressSpace(rlim_t max_bytes) {
     rlimit limit{};
-    if (kLimitAddressSpace && ::getrlimit(RLIMIT_AS, &limit) == 0) {
+    if (!base::kSanitized && ::getrlimit(RLIMIT_AS, &limit) == 0) {
         limit.rlim_cur = std::min(max_bytes, limit.rlim_max);
         ::setrlimit(RLIMIT_AS, &limit);
     }

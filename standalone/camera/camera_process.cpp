@@ -13,7 +13,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include "standalone/camera/sanitizers.h"
+#include "standalone/base/sanitizers.h"
 #include "standalone/media/source.h"
 
 namespace lookhaven::camera {
@@ -27,7 +27,7 @@ class SpawnPlan {
         ::posix_spawn_file_actions_init(&files_);
         ::posix_spawn_file_actions_adddup2(&files_, socket, kSocketOfProcess);
         for (const int standard : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
-            if (!kSanitized || standard != STDERR_FILENO) {  // a sanitizer reports there
+            if (!base::kSanitized || standard != STDERR_FILENO) {  // a sanitizer reports there
                 ::posix_spawn_file_actions_addopen(&files_, standard, "/dev/null", O_RDWR, 0);
             }
         }
@@ -52,7 +52,8 @@ class SpawnPlan {
     int Spawn(const std::string& program, pid_t* pid) const {
         char* arguments[] = {const_cast<char*>("lookhaven-camera"), nullptr};
         char* nothing[] = {nullptr};
-        return ::posix_spawn(pid, program.c_str(), &files_, &attributes_, arguments, kSanitized ? environ : nothing);
+        return ::posix_spawn(pid, program.c_str(), &files_, &attributes_, arguments,
+                             base::kSanitized ? environ : nothing);
     }
 
   private:

@@ -10,8 +10,8 @@
 #include <sys/mman.h>
 #include <sys/socket.h>
 
+#include "standalone/base/sanitizers.h"
 #include "standalone/base/system_call_filter.h"
-#include "standalone/camera/sanitizers.h"
 
 namespace lookhaven::camera {
 
@@ -41,7 +41,7 @@ void AllowHarmless(SystemCallFilter& filter) {
          SCMP_SYS(nanosleep), SCMP_SYS(restart_syscall), SCMP_SYS(rt_sigaction), SCMP_SYS(rt_sigprocmask),
          SCMP_SYS(rt_sigreturn), SCMP_SYS(sched_getaffinity), SCMP_SYS(sched_yield), SCMP_SYS(sigaltstack),
          SCMP_SYS(sigreturn), SCMP_SYS(sysinfo), SCMP_SYS(time), SCMP_SYS(uname)});
-    if (kSanitized) {  // for its checks and reports
+    if (base::kSanitized) {  // for its checks and reports
         filter.AddException({SCMP_SYS(pipe), SCMP_SYS(pipe2), SCMP_SYS(prctl), SCMP_SYS(prlimit64), SCMP_SYS(readlink),
                              SCMP_SYS(readlinkat)});
     }

@@ -17,8 +17,8 @@
 
 #include "standalone/base/file_descriptor.h"
 #include "standalone/base/process.h"
+#include "standalone/base/sanitizers.h"
 #include "standalone/camera/camera_system_calls.h"
-#include "standalone/camera/sanitizers.h"
 
 namespace lookhaven::camera {
 
@@ -55,7 +55,7 @@ void Limit(decltype(RLIMIT_AS) resource, rlim_t most) {
 
 void LimitResources() {
     constexpr rlim_t kMaxAddressSpaceBytes = rlim_t{512} << 20;
-    if (!kSanitized) {  // a sanitizer reserves terabytes, and writes its report to a file
+    if (!base::kSanitized) {  // a sanitizer reserves terabytes, and writes its report to a file
         Limit(RLIMIT_AS, kMaxAddressSpaceBytes);
         Limit(RLIMIT_FSIZE, 0);
     }
@@ -100,7 +100,7 @@ bool ConfineFiles() {
     for (const char* path : kReadable) {
         MakeReadable(rules.Get(), path);
     }
-    if (kSanitized) {
+    if (base::kSanitized) {
         MakeReadable(rules.Get(), "/proc/self");  // for reports
     }
     if (::syscall(SYS_landlock_restrict_self, rules.Get(), 0) != 0) {

@@ -23,6 +23,7 @@
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/base/process.h"
+#include "standalone/base/sanitizers.h"
 #include "standalone/emap/pictures.h"
 #include "standalone/media/libav_libraries.h"
 #include "standalone/media/still_sandbox.h"
@@ -40,13 +41,6 @@ constexpr Outcome kFailed{'x'};  // no fault of the file's
 // Less than the host gives a request.
 constexpr std::chrono::seconds kMaxTime{25};
 constexpr rlim_t kMaxAddressSpace = rlim_t{1} << 30;
-
-// Under a sanitizer a process maps terabytes before main.
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kLimitAddressSpace = false;
-#else
-constexpr bool kLimitAddressSpace = true;
-#endif
 
 void Limit(decltype(RLIMIT_AS) resource, rlim_t most) {
     rlimit limit{};
@@ -79,7 +73,7 @@ void RedrawConfined(std::string_view type, std::string_view file, const std::fun
     base::CloseFrom(STDERR_FILENO + 1);
     Limit(RLIMIT_CORE, 0);
     Limit(RLIMIT_CPU, static_cast<rlim_t>(kMaxTime.count()));
-    if (kLimitAddressSpace) {
+    if (!base::kSanitized) {  // which maps terabytes before main
         Limit(RLIMIT_AS, kMaxAddressSpace);
     }
     if (confine) {

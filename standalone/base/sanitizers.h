@@ -3,7 +3,7 @@
 // Whether this build has a sanitizer, which needs more of the system than our own code does.
 #pragma once
 
-namespace lookhaven::camera {
+namespace lookhaven::base {
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr bool kSanitized = true;
@@ -17,4 +17,4 @@ constexpr bool kSanitized = false;
 constexpr bool kSanitized = false;
 #endif
 
-}  // namespace lookhaven::camera
+}  // namespace lookhaven::base
