@@ -11,6 +11,32 @@ namespace {
 using store::Emap;
 using store::Emaps;
 
+constexpr std::size_t kMaxEmaps = 500;
+
+// A picture's file, written before its change begins since a disk may be slow while the store is locked. Goes with this
+// object unless a map has it.
+class NewPicture {
+  public:
+    NewPicture(store::Store& store, const std::filesystem::path& home, const emap::MapPicture& picture)
+        : pictures_(store, home),
+          name_(pictures_.Write(picture.File())) {}
+    NewPicture(const NewPicture&) = delete;
+    NewPicture& operator=(const NewPicture&) = delete;
+    ~NewPicture() {
+        try {
+            pictures_.Withdraw(name_);
+        } catch (const std::exception&) {
+            // The next Sweep finds it.
+        }
+    }
+
+    const std::string& Name() const { return name_; }
+
+  private:
+    emap::Pictures pictures_;
+    const std::string name_;
+};
+
 }  // namespace
 
 Json::Value EmapRecord(const Emap& emap) {
@@ -33,12 +59,18 @@ Emap RequireEmap(store::Store& store, int id) {
 }
 
 Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, const EmapChange& change) {
+    RequireManager(store, actor);
     Emap emap;
+    NewPicture picture(store, home, change.picture.value());
     Apply(store, actor, [&] {
-        const int id = Emaps(store).Add({.name = change.name.value_or(""),
-                                         .hide_names = change.hide_names.value_or(false),
-                                         .small_items = change.small_items.value_or(false)});
-        emap::Pictures(store, home).Put(id, change.picture.value().File());
+        Emaps emaps(store);
+        if (emaps.List().size() >= kMaxEmaps) {
+            throw store::InvalidRecord("there are at most " + std::to_string(kMaxEmaps) + " e-maps");
+        }
+        const int id = emaps.Add({.name = change.name.value_or(""),
+                                  .hide_names = change.hide_names.value_or(false),
+                                  .small_items = change.small_items.value_or(false)});
+        emaps.SetImage(id, picture.Name());
         emap = RequireEmap(store, id);
         return Change{"emap.add", Named(emap.name, id), {}, EmapRecord(emap)};
     });
@@ -47,21 +79,30 @@ Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
 
 Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
              std::optional<std::int64_t> seen, const EmapChange& change) {
+    RequireManager(store, actor);
+    Emap before;
     Emap emap;
+    std::optional<NewPicture> picture;
+    if (change.picture) {
+        picture.emplace(store, home, *change.picture);
+    }
     Apply(store, actor, [&] {
-        const Emap before = RequireEmap(store, id);
+        before = RequireEmap(store, id);
         RequireCurrent(EmapRecord(before), seen);
         emap = before;
         emap.name = change.name.value_or(before.name);
         emap.hide_names = change.hide_names.value_or(before.hide_names);
         emap.small_items = change.small_items.value_or(before.small_items);
         Emaps(store).Update(emap);
-        if (change.picture) {
-            emap::Pictures(store, home).Put(id, change.picture->File());
+        if (picture) {
+            Emaps(store).SetImage(id, picture->Name());
         }
         emap = RequireEmap(store, id);
         return Change{"emap.set", Named(emap.name, id), EmapRecord(before), EmapRecord(emap)};
     });
+    if (picture) {
+        emap::Pictures(store, home).Retire(before.image);
+    }
     return emap;
 }
 

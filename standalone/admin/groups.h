@@ -9,8 +9,6 @@
 #include <cstdint>
 #include <functional>
 #include <optional>
-#include <string>
-#include <vector>
 
 #include <json/json.h>
 
@@ -19,8 +17,9 @@
 
 namespace lookhaven::admin {
 
-// {"id", "name", "camera": [ids], "revision"}
-Json::Value GroupRecord(const store::CameraGroup& group);
+// {"id", "name", "camera": [ids], "deniedTo": [names of the accounts to which something of the group is denied],
+// "revision"}. Throws store::StoreError.
+Json::Value GroupRecord(store::Store& store, const store::CameraGroup& group);
 
 // These two return the group as it is then.
 store::CameraGroup AddGroup(store::Store& store, const Actor& actor, const store::CameraGroup& group);
@@ -30,8 +29,5 @@ store::CameraGroup SetGroup(store::Store& store, const Actor& actor, int id, std
                             const std::function<void(store::CameraGroup&)>& edit);
 // Its cameras stay. What is denied of it to an account no longer is: the audit log has to whom it was.
 void RemoveGroup(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen);
-
-// Of the accounts to which something of the group is denied.
-std::vector<std::string> DeniedTo(store::Store& store, int group);
 
 }  // namespace lookhaven::admin

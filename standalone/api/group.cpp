@@ -12,21 +12,9 @@ namespace lookhaven::api {
 
 namespace {
 
-Json::Value WithUse(store::Store& records, Json::Value record) {
-    record["deniedTo"] = Json::arrayValue;
-    for (const std::string& account : admin::DeniedTo(records, record["id"].asInt())) {
-        record["deniedTo"].append(account);
-    }
-    return record;
-}
-
-auto Completer(const Call& call) {
-    return [&call](const Json::Value& record) { return WithUse(call.Records(), record); };
-}
-
 std::string AnswerRecord(const Call& call, const store::CameraGroup& group) {
     Json::Value data;
-    data["group"] = WithUse(call.Records(), admin::GroupRecord(group));
+    data["group"] = admin::GroupRecord(call.Records(), group);
     return SuccessAnswer(data);
 }
 
@@ -58,7 +46,7 @@ std::string List(const Call& call) {
     Json::Value data;
     data["group"] = Json::arrayValue;
     for (const store::CameraGroup& group : store::Groups(call.Records()).List()) {
-        data["group"].append(WithUse(call.Records(), admin::GroupRecord(group)));
+        data["group"].append(admin::GroupRecord(call.Records(), group));
     }
     return SuccessAnswer(data);
 }
@@ -71,16 +59,13 @@ std::string Add(const Call& call) {
 
 std::string Set(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
-                            return admin::SetGroup(
-                                call.Records(), call.Actor(), IdOf(call), seen,
-                                [&call](store::CameraGroup& group) { TakeGroupFields(call, group); });
-                        }));
+    return AnswerRecord(call, admin::SetGroup(call.Records(), call.Actor(), IdOf(call), seen,
+                                              [&call](store::CameraGroup& group) { TakeGroupFields(call, group); }));
 }
 
 std::string Remove(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    OnCurrentRecord(Completer(call), [&] { admin::RemoveGroup(call.Records(), call.Actor(), IdOf(call), seen); });
+    admin::RemoveGroup(call.Records(), call.Actor(), IdOf(call), seen);
     return SuccessAnswer(Json::objectValue);
 }
 

@@ -59,7 +59,7 @@ void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
 
 void RequestContext::Begin(const base::Installation& installation, Output* output, RequestEvents events) {
     base::SetLogProgram("request");
-    if (opened_ahead_ && opened_ahead_ != FileOf(installation.StoreUrl())) {
+    if (opened_ahead_ && (opened_ahead_ != FileOf(installation.StoreUrl()) || !records_->IsUpToDate())) {
         records_.reset();
     }
     installation_ = installation;

@@ -77,7 +77,7 @@ std::vector<EmapItem> UpperFloor(const Ids& ids, const std::map<std::string, int
 
 int AddMap(store::Store& store, const std::filesystem::path& home, const char* name, const char* picture) {
     const int id = store::Emaps(store).Add({.name = name});
-    emap::Pictures(store, home).Put(id, picture);
+    store::Emaps(store).SetImage(id, emap::Pictures(store, home).Write(picture));
     return id;
 }
 

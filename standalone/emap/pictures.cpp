@@ -2,12 +2,12 @@
 #include "standalone/emap/pictures.h"
 
 #include <chrono>
-#include <set>
 #include <system_error>
 
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
 #include "standalone/base/text.h"
@@ -85,7 +85,7 @@ std::string_view PictureType(std::string_view bytes) {
     return IsSvg(bytes) ? "svg" : "";
 }
 
-void Pictures::Put(int emap_id, std::string_view bytes) {
+std::string Pictures::Write(std::string_view bytes) {
     if (bytes.size() > kMaxPictureBytes) {
         throw store::InvalidRecord("an e-map's picture has at most 16 MiB");
     }
@@ -93,32 +93,38 @@ void Pictures::Put(int emap_id, std::string_view bytes) {
     if (type.empty()) {
         throw store::InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
     }
-    store::Emaps emaps(store_);
-    const std::optional<store::Emap> before = emaps.Find(emap_id);
-    if (!before) {
-        throw store::NotFound("there is no e-map " + std::to_string(emap_id));
-    }
-    const std::string name = std::to_string(emap_id) + "-" + store::RandomHex(8) + "." + std::string(type);
+    const std::string name = std::to_string(base::WallSeconds()) + "-" + store::RandomHex(8) + "." + std::string(type);
     fs::create_directories(folder_);
     base::WriteFileAtomically(folder_ / name, bytes);
-    try {
-        emaps.SetImage(emap_id, name);
-    } catch (...) {
+    return name;
+}
+
+void Pictures::Withdraw(const std::string& name) {
+    if (IsPictureName(name) && !Used().contains(name)) {
         std::error_code ignored;
         fs::remove(folder_ / name, ignored);
-        throw;
     }
-    // Who has read the map's row just now still looks for the picture that was: it grows old from here.
-    std::error_code ignored;
-    fs::last_write_time(folder_ / before->image, fs::file_time_type::clock::now(), ignored);
+}
+
+void Pictures::Retire(const std::string& name) {
+    // Who has read the map's row just now still looks for it: it grows old from here.
+    if (IsPictureName(name)) {
+        std::error_code ignored;
+        fs::last_write_time(folder_ / name, fs::file_time_type::clock::now(), ignored);
+    }
     Sweep();
 }
 
-void Pictures::Sweep() {
+std::set<std::string> Pictures::Used() {
     std::set<std::string> used;
     for (const store::Emap& emap : store::Emaps(store_).List()) {
         used.insert(emap.image);
     }
+    return used;
+}
+
+void Pictures::Sweep() {
+    const std::set<std::string> used = Used();
     std::error_code error;
     for (const fs::directory_entry& file : fs::directory_iterator(folder_, error)) {
         const fs::file_time_type written = file.last_write_time(error);

@@ -9,6 +9,7 @@
 
 #include <cstddef>
 #include <filesystem>
+#include <set>
 #include <string>
 #include <string_view>
 
@@ -21,7 +22,8 @@ constexpr std::size_t kMaxPictureBytes = 16U << 20U;
 // "png", "jpg", "webp" or "svg"; empty for anything else. An SVG that declares entities is nothing of these.
 std::string_view PictureType(std::string_view bytes);
 
-// Whether a file in that folder may have the name: "<digits>-<16 hex digits>.<type>".
+// Whether a file in that folder may have the name: "<digits>-<16 hex digits>.<type>". The
+// digits are the second in which it was written.
 bool IsPictureName(std::string_view name);
 
 class Pictures {
@@ -29,10 +31,14 @@ class Pictures {
     // The store must outlive this object.
     Pictures(store::Store& store, const std::filesystem::path& home) : store_(store), folder_(home / "emaps") {}
 
-    // Gives the map another picture; then removes the last one, and files that no map names. Throws
-    // store::InvalidRecord for what is no picture or larger than kMaxPictureBytes, store::NotFound for an unknown map,
-    // std::system_error when it cannot be written. After an error the map has its old picture.
-    void Put(int emap_id, std::string_view bytes);
+    // Writes a picture that no map has yet, and returns its file's name for store::Emaps::SetImage. Waits for the disk:
+    // call it before the store is locked. Throws store::InvalidRecord for what is no picture or larger than
+    // kMaxPictureBytes, std::system_error when it cannot be written.
+    std::string Write(std::string_view bytes);
+    // Removes what Write has just written unless a map has it by now.
+    void Withdraw(const std::string& name);
+    // A map has another picture instead of this one, whose file goes a minute from now.
+    void Retire(const std::string& name);
 
     // Removes files that no map names, a minute after they were written: a map's removal leaves one behind.
     void Sweep();
@@ -41,6 +47,8 @@ class Pictures {
     std::string Read(const std::string& name) const;
 
   private:
+    std::set<std::string> Used();
+
     store::Store& store_;
     std::filesystem::path folder_;
 };

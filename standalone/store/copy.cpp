@@ -186,7 +186,7 @@ void RequireTablesOnly(const std::string& url) {
     for (const std::string& statement :
          Connection(StoreAddress::Parse(url))
              .FetchAll<std::string>("select lower(sql) from sqlite_master where type not in ('table', 'index')"
-                                    " or lower(sql) like 'create virtual %'")) {
+                                    " or name in (select name from pragma_table_list where type = 'virtual')")) {
         if (!own.contains(statement)) {
             throw InvalidRecord("the records hold views, triggers or virtual tables that are none of Lookhaven's own");
         }

@@ -131,6 +131,12 @@ Store Store::Open(const std::string& url) {
     return Store(std::move(connection));
 }
 
+bool Store::IsUpToDate() try {
+    return ReadVersionOfReady(*connection_) == SchemaVersion();
+} catch (const std::exception&) {
+    return false;
+}
+
 int Store::Migrate(const std::string& url) {
     const StoreAddress address = StoreAddress::Parse(url);
     PrepareFile(address);

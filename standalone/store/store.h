@@ -72,6 +72,9 @@ class Store {
     // The schema version this program needs.
     static int SchemaVersion();
 
+    // Whether the store, which Open found at this program's schema, still is. False also where it cannot be read.
+    bool IsUpToDate();
+
     Store(Store&&) noexcept;
     Store& operator=(Store&&) noexcept;
     ~Store();

@@ -77,6 +77,8 @@ TEST_P(EmapAdminTest, AreRefusedWithoutATrace) {
     EXPECT_EQ(emaps_.Find(map.id)->image, map.image);
     EXPECT_EQ(emap::Pictures(store_, folder_).Read(map.image), "<svg/>");
     EXPECT_EQ(Audited().size(), entries);
+    const auto files = std::filesystem::directory_iterator(folder_ / "emaps");
+    EXPECT_EQ(std::distance(begin(files), end(files)), 2) << "one of each map, none of what was refused";
     EXPECT_THAT(emaps_.Links(), ElementsAre(testing::Pair(other.id, ElementsAre(map.id))));
 }
 

@@ -52,8 +52,8 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
         store::Store store = store::Store::Open(old_.StoreUrl());
         store::Users(store).Add("bob", "correct horse", store::Privilege::kOwner);
         const int map = store::Emaps(store).Add({.name = "Ground floor"});
-        emap::Pictures(store, old_.Home()).Put(map, "<svg/>");
-        image = store::Emaps(store).Find(map)->image;
+        image = emap::Pictures(store, old_.Home()).Write("<svg/>");
+        store::Emaps(store).SetImage(map, image);
     }
     base::WriteFileAtomically(old_.TlsFolder() / "key.pem", "secret");
     fs::create_directory(old_.SigningKeyFile().parent_path());

@@ -88,7 +88,7 @@ TEST_F(EmapBinding, AMapLoadsForThoseWhoMaySeeItWithItsItemsInOrder) {
 }
 
 TEST_F(EmapBinding, APictureIsItsFileInBase64OrNothing) {
-    emap::Pictures(records_, folder_).Put(1, "<svg/>");
+    store::Emaps(records_).SetImage(1, emap::Pictures(records_, folder_).Write("<svg/>"));
     Emap emap;
     ASSERT_EQ(emap.Load(1), 0);
     int length = -1;

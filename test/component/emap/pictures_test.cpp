@@ -12,6 +12,12 @@ namespace {
 
 class PicturesTest : public store::StoreTest {
   protected:
+    void Put(int map, const std::string& bytes) {
+        const std::string before = emaps_.Find(map)->image;
+        emaps_.SetImage(map, pictures_.Write(bytes));
+        pictures_.Retire(before);
+    }
+
     store::Emaps emaps_{store_};
     Pictures pictures_{store_, folder_};
 };
@@ -43,23 +49,26 @@ TEST(PictureType, IsKnownByWhatTheFileHolds) {
 
 TEST_P(PicturesTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
     const int map = emaps_.Add({.name = "Ground floor"});
-    pictures_.Put(map, "<svg/>");
+    Put(map, "<svg/>");
     const std::string first = emaps_.Find(map)->image;
     EXPECT_EQ(pictures_.Read(first), "<svg/>");
-    EXPECT_THROW(pictures_.Put(map, "MZ"), store::InvalidRecord);
-    EXPECT_THROW(pictures_.Put(map, "<svg>" + std::string(kMaxPictureBytes, ' ')), store::InvalidRecord);
-    EXPECT_THROW(pictures_.Put(99, "<svg/>"), store::NotFound);
-    EXPECT_EQ(emaps_.Find(map)->image, first);
+    EXPECT_THROW(pictures_.Write("MZ"), store::InvalidRecord);
+    EXPECT_THROW(pictures_.Write("<svg>" + std::string(kMaxPictureBytes, ' ')), store::InvalidRecord);
+    const std::string unused = pictures_.Write("<svg/>");
+    pictures_.Withdraw(unused);
+    pictures_.Withdraw(first);
+    EXPECT_THROW(pictures_.Read(unused), std::system_error);
+    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "a map has it";
     namespace fs = std::filesystem;
     const auto make_old = [&] {
         fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
     };
     make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
+    Put(map, "\xff\xd8\xff\xe0");
     EXPECT_NE(emaps_.Find(map)->image, first);
     EXPECT_EQ(pictures_.Read(first), "<svg/>") << "whoever has just been told of it";
     make_old();
-    pictures_.Put(map, "\xff\xd8\xff\xe0");
+    Put(map, "\xff\xd8\xff\xe0");
     EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
 
     std::ofstream(folder_ / "secret.svg") << "<svg/>";

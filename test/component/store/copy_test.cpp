@@ -3,6 +3,7 @@
 // Copying a store's records into another one, on the same engine or the other.
 #include "standalone/store/copy.h"
 
+#include "standalone/store/connection.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
@@ -68,6 +69,40 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(CopyTest);
+
+class StrangersRecords : public EmptyStore {};
+
+TEST_P(StrangersRecords, HoldNoStatementsOfTheirOwn) {
+    constexpr const char* kHidden =
+        "update sqlite_master set sql = replace(sql, 'CREATE VIRTUAL', 'CREATE/**/VIRTUAL') where name = 'f'";
+    const struct {
+        std::vector<const char*> statements;
+        bool refused;
+    } rows[] = {{{}, false},
+                {{"create table t (a)", "create index i on t (a)"}, false},
+                {{"create view v as select 1"}, true},
+                {{"create trigger t after insert on users begin delete from cameras; end"}, true},
+                {{"create virtual table f using fts5(t)"}, true},
+                {{"create virtual table f using fts5(t)", "pragma writable_schema = on", kHidden}, true}};
+    int number = 0;
+    for (const auto& row : rows) {
+        const std::string url = NewUrl(Engine::kSqlite, std::to_string(++number) + ".db");
+        Store::Migrate(url);
+        {
+            Connection connection(StoreAddress::Parse(url));
+            for (const char* statement : row.statements) {
+                connection.Execute(statement);
+            }
+        }
+        if (row.refused) {
+            EXPECT_THROW(RequireTablesOnly(url), InvalidRecord) << row.statements.back();
+        } else {
+            RequireTablesOnly(url);
+        }
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(, StrangersRecords, testing::Values(Engine::kSqlite), EngineName);
 
 }  // namespace
 }  // namespace lookhaven::store
