@@ -133,8 +133,12 @@ TEST_F(EmapSetup, AGroupIsAddedChangedAndRemovedOnTopOfWhatWasSeen) {
         store::Users users(records);
         users.DenyGroup(users.FindByName("guest").value().id, 1, {store::CameraAccess::kLive});
     }
-    EXPECT_EQ(ask("List", "{}").Json()["data"]["group"][0]["deniedTo"][0], "guest");
-    const std::string seen = R"({"id": 1, "revision": )" + group["revision"].asString();
+    const Json::Value denied = ask("List", "{}").Json()["data"]["group"][0];
+    EXPECT_EQ(denied["deniedTo"][0], "guest");
+    const auto seen_as = [](const Json::Value& record) {
+        return R"({"id": 1, "revision": )" + record["revision"].asString();
+    };
+    const std::string seen = seen_as(denied);
     const struct {
         std::string method;
         std::string body;
@@ -146,6 +150,7 @@ TEST_F(EmapSetup, AGroupIsAddedChangedAndRemovedOnTopOfWhatWasSeen) {
         {"Add", R"({"name": "Shed", "camera": 1})", 400},
         {"Set", R"({"id": 1, "name": "Court"})", 400},
         {"Set", R"({"id": 9, "revision": 1})", 404},
+        {"Remove", seen_as(group) + "}", 409},
         {"Set", seen + R"(, "camera": ["x"]})", 400},
         {"Set", seen + R"(, "name": "Court"})", 200},
         {"Set", seen + R"(, "name": "Court"})", 409},
@@ -159,7 +164,7 @@ TEST_F(EmapSetup, AGroupIsAddedChangedAndRemovedOnTopOfWhatWasSeen) {
     const Json::Value now = ask("List", "{}").Json()["data"]["group"][0];
     EXPECT_EQ(now["name"], "Court");
     EXPECT_EQ(ask("Set", seen + "}").Json()["error"]["data"], now);
-    EXPECT_EQ(ask("Remove", R"({"id": 1, "revision": )" + now["revision"].asString() + "}").status, 200);
+    EXPECT_EQ(ask("Remove", seen_as(now) + "}").status, 200);
 }
 
 }  // namespace
