@@ -2,6 +2,7 @@
 #include "standalone/admin/emaps.h"
 
 #include "standalone/admin/change.h"
+#include "standalone/emap/item_json.h"
 #include "standalone/emap/pictures.h"
 
 namespace lookhaven::admin {
@@ -36,6 +37,12 @@ class NewPicture {
     emap::Pictures pictures_;
     const std::string name_;
 };
+
+Json::Value RecordWithItems(store::Store& store, int id) {
+    Json::Value record = EmapRecord(RequireEmap(store, id));
+    record["items"] = emap::ToJson(Emaps(store).Items(id));
+    return record;
+}
 
 }  // namespace
 
@@ -104,6 +111,16 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
         emap::Pictures(store, home).Retire(before.image);
     }
     return emap;
+}
+
+int PlaceItems(store::Store& store, const Actor& actor, const Emap& emap, const std::vector<store::EmapItem>& items) {
+    int revision = 0;
+    Apply(store, actor, [&] {
+        const Json::Value before = RecordWithItems(store, emap.id);
+        revision = Emaps(store).ReplaceItems(emap, items);
+        return Change{"emap.place", Named(before["name"].asString(), emap.id), before, RecordWithItems(store, emap.id)};
+    });
+    return revision;
 }
 
 void RemoveEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,

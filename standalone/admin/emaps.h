@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Changes of e-maps, but for what is placed on them.
+// Changes of e-maps and of what is placed on them.
 //
 // Failures      Each throws Forbidden, Stale, store::NotFound, store::InvalidRecord, store::AlreadyExists,
 //               store::StoreError, and std::system_error where a picture cannot be written; nothing was changed then.
@@ -10,6 +10,7 @@
 #include <filesystem>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include <json/json.h>
 
@@ -40,6 +41,10 @@ store::Emap AddEmap(store::Store& store, const Actor& actor, const std::filesyst
 // seen: the map's revision that the actor saw; nothing for whatever it is.
 store::Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
                     std::optional<std::int64_t> seen, const EmapChange& change);
+// Replaces all items and both flags of the map, and returns its new revision, as store::Emaps::ReplaceItems does, whose
+// Conflict it throws too.
+int PlaceItems(store::Store& store, const Actor& actor, const store::Emap& emap,
+               const std::vector<store::EmapItem>& items);
 // With its items and its picture. Links to it stay on other maps until these are changed, and lead nowhere.
 void RemoveEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
                 std::optional<std::int64_t> seen);

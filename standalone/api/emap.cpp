@@ -5,6 +5,7 @@
 
 #include <algorithm>
 
+#include "standalone/admin/emaps.h"
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/named_list.h"
 #include "standalone/base/clock.h"
@@ -53,7 +54,8 @@ std::string SaveItems(const Call& call) {
         emap.small_items = small.asBool();
     }
     Json::Value data;
-    data["revision"] = store::Emaps(call.Records()).ReplaceItems(emap, emap::ItemsFromJson(call.Parameter("items")));
+    data["revision"] =
+        admin::PlaceItems(call.Records(), call.Actor(), emap, emap::ItemsFromJson(call.Parameter("items")));
     return SuccessAnswer(data);
 }
 

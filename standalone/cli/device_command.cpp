@@ -4,12 +4,14 @@
 #include <optional>
 #include <regex>
 
+#include "standalone/admin/devices.h"
 #include "standalone/base/clock.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/store/devices.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
@@ -18,7 +20,6 @@ namespace {
 using store::Device;
 using store::Devices;
 using store::EmapItemType;
-using store::PortType;
 
 // A kind of device, which is a group of commands.
 struct Kind {
@@ -55,13 +56,14 @@ void AddPort(const std::string& text, std::map<int, store::Port>& ports) {
     if (!matches || !index || !camera || ports.contains(*index)) {
         throw Failure(kUsage, "a port is its number and type, such as 0:in, or with its camera 0:in:4");
     }
-    ports[*index] = {parts.str(2) == "in" ? PortType::kInput : PortType::kOutput, *camera};
+    ports[*index] = {store::PortTypeNames().at(parts.str(2)), *camera};
 }
 
 Json::Value ToData(const Device& device) {
     const auto port_data = [](const auto& numbered) {
         const auto& [number, port] = numbered;
-        return Object("port", number, "type", port.type == PortType::kInput ? "in" : "out", "camera", port.camera_id);
+        return Object("port", number, "type", base::NameOf(store::PortTypeNames(), port.type), "camera",
+                      port.camera_id);
     };
     return Object("id", device.id, "name", device.name, "server", device.server_id, "id_on_server", device.id_on_server,
                   "camera", device.camera_id, "ports", Array(device.ports, port_data));
@@ -89,7 +91,7 @@ constexpr Column kColumns[] = {{"id", "id"},
                                {"camera", "camera", TextUnlessZero},
                                {"ports", "ports", PortsText}};
 
-void Apply(const Request& request, Device& device) {
+void Edit(const Request& request, Device& device) {
     device.name = request.name.value_or(device.name);
     device.camera_id = request.camera.value_or(device.camera_id);
     if (!request.ports.empty()) {
@@ -103,19 +105,17 @@ void Apply(const Request& request, Device& device) {
 void Add(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     Device device{.kind = kind.type, .server_id = request.server, .id_on_server = request.id_on_server};
-    Apply(request, device);
+    Edit(request, device);
     store::Store store = console.OpenStore();
-    const int id = Devices(store).Add(device);
-    console.Answer(ToData(*Devices(store).Find(kind.type, id)), "Added ", kind.name, " ", device.name, " with id ", id,
-                   ".");
+    device = admin::AddDevice(store, {}, device);
+    console.Answer(ToData(device), "Added ", kind.name, " ", device.name, " with id ", device.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
-    Device device = Require(Devices(store).Find(kind.type, request.id), "there is no ", kind.name, " ", request.id);
-    Apply(request, device);
-    Devices(store).Update(device);
+    const Device device =
+        admin::SetDevice(store, {}, kind.type, request.id, {}, [&request](Device& edited) { Edit(request, edited); });
     console.Answer(ToData(device), "Changed ", kind.name, " ", device.name, ".");
 }
 
@@ -128,7 +128,7 @@ void List(const Console& console, const Request& request) {
 void Remove(const Console& console, const Request& request) {
     const Kind& kind = *request.kind;
     store::Store store = console.OpenStore();
-    Devices(store).Remove(kind.type, request.id);
+    admin::RemoveDevice(store, {}, kind.type, request.id, {});
     console.Answer(Object("id", request.id), "Removed ", kind.name, " ", request.id, ".");
 }
 

@@ -147,7 +147,7 @@ void Import(const Console& console, const Request& request) {
     const std::filesystem::path home = console.Installation().Home();
     Emap emap = admin::AddEmap(store, {}, home, change);
     try {
-        emap.revision = Emaps(store).ReplaceItems(emap, items);
+        emap.revision = admin::PlaceItems(store, {}, emap, items);
     } catch (...) {
         admin::RemoveEmap(store, {}, home, emap.id, {});
         throw;

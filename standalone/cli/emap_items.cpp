@@ -4,6 +4,7 @@
 #include <optional>
 #include <vector>
 
+#include "standalone/admin/emaps.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/table.h"
 #include "standalone/emap/item_json.h"
@@ -52,7 +53,7 @@ void Edit(const Console& console, int id, ChangeItems&& change) {
     std::vector<EmapItem> items = emaps.Items(id);
     const std::string sentence = change(items);
     try {
-        emap.revision = emaps.ReplaceItems(emap, items);
+        emap.revision = admin::PlaceItems(store, {}, emap, items);
     } catch (const store::Conflict& conflict) {
         throw Failure(kUnavailable, conflict.what(), ": try again");
     }

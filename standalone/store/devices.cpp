@@ -52,23 +52,9 @@ namespace {
 
 constexpr std::size_t kMaxNameBytes = 64;
 
-// What the sentences call a device, and where its ids come from.
-struct Kind {
-    const char* name;
-    const char* counter;
-};
-
-Kind KindOf(EmapItemType kind) {
-    switch (kind) {
-    case EmapItemType::kDoor:
-        return {"door", "door"};
-    case EmapItemType::kIoModule:
-        return {"I/O module", "io"};
-    case EmapItemType::kPos:
-        return {"POS terminal", "pos"};
-    default:
-        throw InvalidRecord("a device is a door, an I/O module or a POS terminal");
-    }
+// Where its ids come from.
+const char* CounterOf(EmapItemType kind) {
+    return kind == EmapItemType::kDoor ? "door" : kind == EmapItemType::kIoModule ? "io" : "pos";
 }
 
 Device WithPorts(soci::session& sql, Device device) {
@@ -104,7 +90,7 @@ constexpr const char* kWithId = " and id = :id";
 constexpr const char* kOnServer = " and server_id = :server and id_on_server = :there";
 
 Device RequireDevice(soci::session& sql, EmapItemType kind, int id) {
-    return Require(FetchDevice(sql, kWithId, kind, id), KindOf(kind).name, id);
+    return Require(FetchDevice(sql, kWithId, kind, id), DeviceKindText(kind), id);
 }
 
 // A camera of this host or of a recording server.
@@ -120,13 +106,12 @@ void RequirePairedCamera(soci::session& sql, int id) {
 }
 
 void RequireValid(const Device& device) {
-    const Kind kind = KindOf(device.kind);
+    const std::string kind = DeviceKindText(device.kind);
     if (device.name.empty() || !IsPlainText(device.name, kMaxNameBytes)) {
-        throw InvalidRecord(std::string("the name of a ") + kind.name +
-                            " is 1 to 64 bytes of UTF-8 without control characters");
+        throw InvalidRecord("the name of a " + kind + " is 1 to 64 bytes of UTF-8 without control characters");
     }
     if (device.kind != EmapItemType::kIoModule && !device.ports.empty()) {
-        throw InvalidRecord(std::string("a ") + kind.name + " has no ports");
+        throw InvalidRecord("a " + kind + " has no ports");
     }
     if (device.kind == EmapItemType::kDoor && device.server_id != 0) {
         throw InvalidRecord("a door is this host's own");
@@ -158,19 +143,31 @@ bool IsStateOf(EmapItemType kind, std::string_view state) {
 
 }  // namespace
 
+std::string DeviceKindText(EmapItemType kind) {
+    switch (kind) {
+    case EmapItemType::kDoor:
+        return "door";
+    case EmapItemType::kIoModule:
+        return "I/O module";
+    case EmapItemType::kPos:
+        return "POS terminal";
+    default:
+        throw InvalidRecord("a device is a door, an I/O module or a POS terminal");
+    }
+}
+
 int Devices::Add(const Device& device) {
     RequireValid(device);
     return connection_.Write([&](soci::session& sql) {
         Device added = device;
-        added.id = NextId(sql, KindOf(device.kind).counter);
+        added.id = NextId(sql, CounterOf(device.kind));
         if (added.server_id == 0) {
             added.id_on_server = added.id;
         } else {
             Require(FetchOne<int>(sql, "select id from servers where id = :id", added.server_id), "server",
                     added.server_id);
             if (FetchDevice(sql, kOnServer, added.kind, added.server_id, added.id_on_server)) {
-                throw AlreadyExists(std::string("this ") + KindOf(device.kind).name +
-                                    " of the server is known already");
+                throw AlreadyExists("this " + DeviceKindText(device.kind) + " of the server is known already");
             }
         }
         RequirePairedCamera(sql, added.camera_id);
@@ -241,8 +238,8 @@ void Devices::Report(const DeviceState& state) {
             const Device device = RequireDevice(sql, state.kind, state.id);
             const bool is_door = state.kind == EmapItemType::kDoor;
             if (is_door ? state.port != -1 : !device.ports.contains(state.port)) {
-                throw NotFound(std::string("the ") + KindOf(state.kind).name + " " + std::to_string(state.id) +
-                               " has no port " + std::to_string(state.port));
+                throw NotFound("the " + DeviceKindText(state.kind) + " " + std::to_string(state.id) + " has no port " +
+                               std::to_string(state.port));
             }
             if (!IsStateOf(state.kind, state.state)) {
                 throw InvalidRecord("a door is open, closed or locked, a port is on or off");

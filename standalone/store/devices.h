@@ -36,6 +36,9 @@ struct Device {
     std::map<int, Port> ports = {};  // of an I/O module, by index from 0
 };
 
+// "door", "I/O module", "POS terminal" in sentences. Throws InvalidRecord for another type of item.
+std::string DeviceKindText(EmapItemType kind);
+
 // A device's inputs come first, its outputs after them.
 struct PortCounts {
     int inputs = 0;

@@ -26,4 +26,15 @@ const base::Names<MarkKind>& MarkKindNames() {
     return names;
 }
 
+const base::Names<EmapItemType>& DeviceKindNames() {
+    static const base::Names<EmapItemType> names = {
+        {"door", EmapItemType::kDoor}, {"io", EmapItemType::kIoModule}, {"pos", EmapItemType::kPos}};
+    return names;
+}
+
+const base::Names<PortType>& PortTypeNames() {
+    static const base::Names<PortType> names = {{"in", PortType::kInput}, {"out", PortType::kOutput}};
+    return names;
+}
+
 }  // namespace lookhaven::store

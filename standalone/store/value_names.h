@@ -4,6 +4,7 @@
 #pragma once
 
 #include "standalone/base/names.h"
+#include "standalone/store/devices.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/users.h"
@@ -14,5 +15,7 @@ const base::Names<RecordMode>& RecordModeNames();      // always, never, schedul
 const base::Names<Privilege>& PrivilegeNames();        // owner, manager, viewer
 const base::Names<CameraAccess>& CameraAccessNames();  // live, playback, audio
 const base::Names<MarkKind>& MarkKindNames();          // alert, pos
+const base::Names<EmapItemType>& DeviceKindNames();    // door, io, pos
+const base::Names<PortType>& PortTypeNames();          // in, out
 
 }  // namespace lookhaven::store

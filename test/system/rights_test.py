@@ -46,6 +46,10 @@ POST Emap.Add name=x                                                  E      E  
 POST Emap.Picture emap={map} revision=99                              E      E     F       F     F    F       F        F      C/N     E
 POST Emap.Rename emap={map} revision=99 name=x                        E      E     F       F     F    F       F        F      C/N     E
 POST Emap.Remove emap={map} revision=99                               E      E     F       F     F    F       F        F      C/N     E
+POST Device.List                                                      E      E     F       F     F    F       F        F      D       E
+POST Device.Add kind=door name=                                       E      E     F       F     F    F       F        F      B       E
+POST Device.Set kind=door id={door} revision=1 name=x                 E      E     F       F     F    F       F        F      C/N     E
+POST Device.Remove kind=door id={door} revision=1                     E      E     F       F     F    F       F        F      C/N     E
 POST Group.List                                                       E      E     F       F     F    F       F        F      D       E
 POST Group.Add name=                                                  E      E     F       F     F    F       F        F      B       E
 POST Group.Set id={group} revision=1 name=x                           E      E     F       F     F    F       F        F      C/N     E

@@ -45,9 +45,11 @@ TEST_P(EmapAdminTest, AreAuditedWhoeverMakesThem) {
     EXPECT_NE(redrawn.image, added.image) << "a browser must not show the last one";
     EXPECT_EQ(redrawn.name, "Court");
     SetEmap(store_, ada, folder_, added.id, redrawn.revision, {.name = "Court"});
+    PlaceItems(store_, ada, *emaps_.Find(added.id), {{.type = store::EmapItemType::kEmap, .device_id = added.id}});
     RemoveEmap(store_, ada, folder_, added.id, {});
     EXPECT_THAT(Audited(),
-                ElementsAre(HasSubstr("emap.remove Court (1) {"), HasSubstr("emap.set Court (1) {"),
+                ElementsAre(HasSubstr("emap.remove Court (1) {"), HasSubstr("emap.place Court (1) {"),
+                            HasSubstr("emap.set Court (1) {"),
                             HasSubstr(R"("name":"Yard","picture":")" + added.image + R"(","smallItemSize":false})"),
                             HasSubstr("emap.add Yard (1) {")))
         << "what changes nothing leaves no row";

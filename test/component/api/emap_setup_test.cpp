@@ -167,5 +167,52 @@ TEST_F(EmapSetup, AGroupIsAddedChangedAndRemovedOnTopOfWhatWasSeen) {
     EXPECT_EQ(ask("Remove", seen_as(now) + "}").status, 200);
 }
 
+TEST_F(EmapSetup, DevicesAreAddedChangedAndRemovedOnTopOfWhatWasSeen) {
+    const auto ask = [this](const std::string& method, const std::string& body, const char* account = "admin") {
+        return Ask("Device&method=" + method, body, kJson, account);
+    };
+    const Json::Value added =
+        ask("Add", R"({"kind": "io", "name": "Box", "port": [{"port": 5, "type": "out"}]})").Json()["data"]["device"];
+    EXPECT_EQ(added["port"][0]["camera"], 0);
+    const std::string seen = R"({"kind": "io", "id": 1, "revision": )" + added["revision"].asString();
+    const std::string add = R"({"kind": "io", "name": "x", "port": )";
+    const struct {
+        std::string method;
+        std::string body;
+        int status;
+    } rows[] = {
+        {"Add", R"({"kind": "camera", "name": "x"})", 400},
+        {"Add", R"({"kind": ["io"], "name": "x"})", 400},
+        {"Add", R"({"kind": "door", "name": ""})", 400},
+        {"Add", R"({"kind": "door", "name": "x", "camera": 99})", 404},
+        {"Add", R"({"kind": "door", "name": "x", "port": [{"port": 0, "type": "in"}]})", 400},
+        {"Add", add + "5}", 400},
+        {"Add", add + "[5]}", 400},
+        {"Add", add + R"([{"port": "0", "type": "in"}]})", 400},
+        {"Add", add + R"([{"port": 0, "type": 1}]})", 400},
+        {"Add", add + R"([{"port": 0, "type": "in", "camera": "x"}]})", 400},
+        {"Add", add + R"([{"port": 64, "type": "in"}]})", 400},
+        {"Add", add + R"([{"port": 1, "type": "in"}, {"port": 1, "type": "out"}]})", 400},
+        {"Set", R"({"kind": "io", "id": 1, "name": "y"})", 400},
+        {"Set", R"({"kind": "pos", "id": 1, "revision": 1})", 404},
+        {"Set", seen + R"(, "name": "Case"})", 200},
+        {"Set", seen + R"(, "name": "Case"})", 409},
+        {"Remove", seen + "}", 409},
+    };
+    for (const auto& row : rows) {
+        const Answer answer = ask(row.method, row.body);
+        EXPECT_EQ(answer.status, row.status) << row.method << row.body << answer.body;
+        EXPECT_EQ(ask(row.method, row.body, "guest").status, 403);
+    }
+    const Json::Value list = ask("List", "{}").Json()["data"]["device"];
+    ASSERT_EQ(list.size(), 1U);
+    EXPECT_EQ(list[0]["name"], "Case");
+    EXPECT_EQ(list[0]["port"], added["port"]) << "what the call does not name stays";
+    EXPECT_EQ(ask("Set", seen + "}").Json()["error"]["data"], list[0]);
+    const std::string now = R"({"kind": "io", "id": 1, "revision": )" + list[0]["revision"].asString() + "}";
+    EXPECT_EQ(ask("Remove", now).status, 200);
+    EXPECT_EQ(ask("Remove", now).status, 404);
+}
+
 }  // namespace
 }  // namespace lookhaven::api

@@ -7,12 +7,13 @@ import { yesNo } from "../../widgets/text";
 import { weekText } from "../cameras/plan";
 
 /** Where the user knows it by another name. */
-const kAreas: Record<string, string> = { user: "account", group: "camera group", emap: "map" };
+const kAreas: Record<string, string> = { user: "account", group: "camera group", emap: "map", io: "I/O module", pos: "POS terminal" };
 const kVerbs: Record<string, string> = {
   add: "added",
   set: "changed",
   remove: "removed",
   order: "put in order",
+  place: "items placed",
   changePassword: "password changed",
   endSessions: "sessions ended",
 };

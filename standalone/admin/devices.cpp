@@ -1,0 +1,82 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/devices.h"
+
+#include "standalone/admin/change.h"
+#include "standalone/store/value_names.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+using store::Device;
+using store::Devices;
+using store::EmapItemType;
+
+std::string KindName(EmapItemType kind) {
+    return base::NameOf(store::DeviceKindNames(), kind);
+}
+
+Device RequireDevice(store::Store& store, EmapItemType kind, int id) {
+    std::optional<Device> device = Devices(store).Find(kind, id);
+    if (!device) {
+        throw store::NotFound("there is no " + store::DeviceKindText(kind) + " " + std::to_string(id));
+    }
+    return *std::move(device);
+}
+
+}  // namespace
+
+Json::Value DeviceRecord(const Device& device) {
+    Json::Value json;
+    json["kind"] = KindName(device.kind);
+    json["id"] = device.id;
+    json["name"] = device.name;
+    json["server"] = device.server_id;
+    json["idOnServer"] = device.id_on_server;
+    json["camera"] = device.camera_id;
+    json["port"] = Json::arrayValue;
+    for (const auto& [number, port] : device.ports) {
+        Json::Value& each = json["port"].append(Json::objectValue);
+        each["port"] = number;
+        each["type"] = base::NameOf(store::PortTypeNames(), port.type);
+        each["camera"] = port.camera_id;
+    }
+    json["revision"] = Json::Int64{RevisionOf(json)};
+    return json;
+}
+
+Device AddDevice(store::Store& store, const Actor& actor, const Device& device) {
+    Device added;
+    Apply(store, actor, [&] {
+        added = RequireDevice(store, device.kind, Devices(store).Add(device));
+        return Change{KindName(added.kind) + ".add", Named(added.name, added.id), {}, DeviceRecord(added)};
+    });
+    return added;
+}
+
+Device SetDevice(store::Store& store, const Actor& actor, EmapItemType kind, int id, std::optional<std::int64_t> seen,
+                 const std::function<void(Device&)>& edit) {
+    Device device;
+    Apply(store, actor, [&] {
+        const Json::Value before = DeviceRecord(device = RequireDevice(store, kind, id));
+        RequireCurrent(before, seen);
+        edit(device);
+        Devices(store).Update(device);
+        device = RequireDevice(store, kind, id);
+        return Change{KindName(kind) + ".set", Named(device.name, id), before, DeviceRecord(device)};
+    });
+    return device;
+}
+
+void RemoveDevice(store::Store& store, const Actor& actor, EmapItemType kind, int id,
+                  std::optional<std::int64_t> seen) {
+    Apply(store, actor, [&] {
+        const Device device = RequireDevice(store, kind, id);
+        const Json::Value before = DeviceRecord(device);
+        RequireCurrent(before, seen);
+        Devices(store).Remove(kind, id);
+        return Change{KindName(kind) + ".remove", Named(device.name, id), before, {}};
+    });
+}
+
+}  // namespace lookhaven::admin
