@@ -53,6 +53,7 @@ import "./style/settings.css";
 import "./style/cameras.css";
 import "./style/accounts.css";
 import "./style/emaps.css";
+import "./style/devices.css";
 import "./style/storage.css";
 import "./style/audit.css";
 import { App } from "./ui/app";

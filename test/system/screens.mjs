@@ -60,6 +60,7 @@ await visit(async (page, complaints) => {
     ["groups", "groups", ".record-row"],
     ["group", "groups&open=1", ".form"],
     ["maps", "maps", ".emap-row img"],
+    ["devices", "devices", ".device-row"],
     ["accounts", "accounts", ".record-row"],
     ["account", "accounts&open=2", ".rights"],
     ["storage", "storage", ".mount-card"],

@@ -31,6 +31,7 @@ class ScreensTest(unittest.TestCase):
                 ("groups", "Cameras", None),
                 ("group", "Cameras", None),
                 ("maps", "Maps", None),
+                ("devices", "Maps", None),
                 ("accounts", "Accounts", None),
                 ("account", "Accounts", None),
                 ("storage", "Storage", "Storage"),

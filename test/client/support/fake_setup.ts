@@ -3,6 +3,7 @@
 // Cameras, groups, e-maps, accounts and mounts that are set up, with revisions, and the password "right" of the manager.
 
 import type { CameraRecord } from "../../../client/src/wire/camera_setup";
+import type { DeviceRecord } from "../../../client/src/wire/devices";
 import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { MountRecord } from "../../../client/src/wire/mounts";
@@ -25,6 +26,7 @@ export class FakeSetup {
   readonly mount: MountRecord[] = [];
   readonly group: GroupRecord[] = [];
   readonly emap: EmapRecord[] = [];
+  readonly device: DeviceRecord[] = [];
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
   /** The answer of a probe. */
@@ -46,12 +48,15 @@ export class FakeSetup {
     "VEXO.Group.List": () => ok({ group: this.group }),
     "VEXO.Group.Add": (request) => this.#note("Group.Add", request, ok({ group: { ...request, id: 7, revision: 1, deniedTo: [] } })),
     "VEXO.Group.Set": (request) => this.#set("group", request),
+    "VEXO.Device.List": () => ok({ device: this.device }),
+    "VEXO.Device.Add": (request) => this.#note("Device.Add", request, ok({ device: { ...request, id: 3, revision: 1 } })),
+    "VEXO.Device.Set": (request) => this.#set("device", request),
     "VEXO.Emap.List": () => ok({ emap: this.emap }),
     "VEXO.Emap.Rename": ({ emap, ...rest }) => this.#set("emap", { ...rest, id: Number(emap) } as Request),
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
   };
 
-  #set(kind: "camera" | "user" | "mount" | "group" | "emap", request: Request): Answer {
+  #set(kind: "camera" | "user" | "mount" | "group" | "emap" | "device", request: Request): Answer {
     const { id, revision, ...changes } = request;
     const record = this[kind].find((one) => one.id === id)!;
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);

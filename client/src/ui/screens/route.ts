@@ -13,7 +13,7 @@ import type { FootageRef } from "../../wire/footage";
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
-export const kSettingsSections = ["cameras", "groups", "maps", "accounts", "storage", "audit"] as const;
+export const kSettingsSections = ["cameras", "groups", "maps", "devices", "accounts", "storage", "audit"] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;

@@ -8,6 +8,7 @@ import { CamerasPage } from "../settings/cameras/cameras_page";
 import { noRightState, type Page, type PageContext } from "../settings/page";
 import { AccountsPage } from "../settings/accounts/accounts_page";
 import { AccountPage } from "../settings/accounts/account_page";
+import { DevicesPage } from "../settings/devices/devices_page";
 import { GroupPage } from "../settings/groups/group_page";
 import { GroupsPage } from "../settings/groups/groups_page";
 import { MapsPage } from "../settings/maps/maps_page";
@@ -22,8 +23,9 @@ import { Screen } from "./screen";
 import type { RememberedState, Session } from "./session";
 import { SetupSteps } from "./setup_steps";
 
-/** Groups are reached from the cameras. */
-const kSections: Record<Exclude<SettingsSection, "groups">, [label: string, icon: IconName]> = {
+type MenuSection = Exclude<SettingsSection, "groups" | "devices">;
+const kReachedFrom: Partial<Record<SettingsSection, MenuSection>> = { groups: "cameras", devices: "maps" };
+const kSections: Record<MenuSection, [label: string, icon: IconName]> = {
   cameras: ["Cameras", "camera"],
   maps: ["Maps", "map"],
   accounts: ["Accounts", "people"],
@@ -35,6 +37,7 @@ const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
   cameras: CamerasPage,
   groups: GroupsPage,
   maps: MapsPage,
+  devices: DevicesPage,
   accounts: AccountsPage,
   storage: StoragePage,
   audit: AuditPage,
@@ -136,7 +139,7 @@ export class SettingsScreen extends Screen {
     this.#page = record ? new record(context, route.open!) : new kLists[route.section](context);
     this.#place.replaceChildren(this.#page.root);
     this.#place.scrollTop = 0;
-    const section = route.section === "groups" ? "cameras" : route.section;
+    const section = kReachedFrom[route.section] ?? (route.section as MenuSection);
     titleScreen(kSections[section][0]);
     this.#links.forEach((link) => {
       if (link.getAttribute("href") === settingsAddress(section)) link.setAttribute("aria-current", "page");

@@ -30,6 +30,43 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.locator(".nav").textContent()).toBe("LiveEventsMaps");
   });
 
+  test("a device is added with its ports, and no change of someone else's is lost unseen", async () => {
+    setup.device.splice(0, Infinity);
+    const page = await open("devices");
+    await page.getByRole("button", { name: "Add the first device…" }).click();
+    const dialog = page.locator("dialog[open]");
+    const add = dialog.getByRole("button", { name: "Add", exact: true });
+    await add.click();
+    await dialog.getByText("give the device a name").waitFor();
+    await dialog.getByLabel("Name").fill("Plant room");
+    await dialog.getByText("I/O module").click();
+    for (let port = 0; port < 3; port += 1) await dialog.getByRole("button", { name: "Add a port" }).click();
+    await dialog.getByRole("button", { name: "Remove this port" }).nth(1).click();
+    await dialog.getByLabel("Number").last().fill("0");
+    await add.click();
+    await dialog.getByText("Two ports have the same number").waitFor();
+    await dialog.getByLabel("Number").last().fill("5");
+    await dialog.getByLabel("Type").last().selectOption("output");
+    await dialog.getByLabel("Camera", { exact: true }).first().selectOption("Gate");
+    await add.click();
+    await dialog.waitFor({ state: "detached" });
+    const port = [{ port: 0, type: "in" as const, camera: 2 }, { port: 5, type: "out" as const, camera: 0 }];
+    expect(setup.asked).toEqual([["Device.Add", { kind: "io", name: "Plant room", camera: 0, port }]]);
+
+    const device = { kind: "door" as const, id: 1, revision: 2, name: "Front door", server: 0, camera: 9, port: [] };
+    setup.device.push(device);
+    await page.reload();
+    await page.getByRole("button", { name: "Change Front door" }).click();
+    device.revision = 3;
+    await dialog.getByLabel("Name").fill("Main door");
+    const saveIt = dialog.getByRole("button", { name: "Save" });
+    await saveIt.click();
+    await dialog.getByText("Someone else has changed Front door").waitFor();
+    await saveIt.click();
+    await page.getByText("Main door", { exact: true }).waitFor();
+    expect(setup.device[0]).toMatchObject({ name: "Main door", camera: 9, revision: 4 });
+  });
+
   test("a camera is added when its picture was seen; a test can be given up, and fails with a reason", async () => {
     const page = await open("cameras&open=new");
     await page.getByLabel("Address", { exact: true }).fill("camera-3");

@@ -3,12 +3,12 @@
 // What is asked before a map is added, renamed, given another picture or removed.
 
 import type { EmapRecord, EmapSetup } from "../../../wire/emap_setup";
-import { asServerError } from "../../../wire/server";
 import type { UploadOptions } from "../../../wire/upload";
 import { counted } from "../../widgets/amounts";
 import { element } from "../../widgets/dom";
 import { fileField, textField } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
+import { Seen } from "../seen";
 import { kPictureFiles, nameOfFile, pictureOfFile } from "./picture_file";
 
 const kPictureHint = "PNG, JPEG, WebP or SVG, at most 20 MB. Nothing but the picture itself is kept of the file.";
@@ -69,29 +69,6 @@ export function removalSentences({ items, linkedFrom }: Pick<EmapRecord, "items"
       : "Its picture goes.",
     links ? `It is also shown as a link on: ${links}. That link will lead nowhere.` : "No other map has a link to it.",
   ];
-}
-
-/** The map as the user has seen it. */
-class Seen {
-  readonly #submit: string;
-  #map: EmapRecord;
-
-  constructor(map: EmapRecord, submit: string) {
-    this.#map = map;
-    this.#submit = submit;
-  }
-
-  /** A sentence where someone else was faster; the next attempt is made on what there is now. */
-  async attempt(work: (current: EmapRecord) => Promise<unknown>): Promise<string | void> {
-    try {
-      await work(this.#map);
-    } catch (error) {
-      const { status, data } = asServerError(error);
-      if (status !== 409 || typeof data !== "object" || data === null || !("revision" in data)) throw error;
-      this.#map = data as EmapRecord;
-      return `Someone else has changed ${this.#map.name} in the meantime. Press ${this.#submit} again to go on all the same.`;
-    }
-  }
 }
 
 interface PictureWork {

@@ -6,7 +6,8 @@ import { EmapSetup, type EmapRecord } from "../../../wire/emap_setup";
 import { Emaps } from "../../../wire/emaps";
 import { Semaphore } from "../../../wire/semaphore";
 import { asServerError } from "../../../wire/server";
-import { button } from "../../widgets/button";
+import { settingsAddress } from "../../screens/route";
+import { button, linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";
 import { emptyState, LoadedPage, type PageContext } from "../page";
@@ -29,7 +30,9 @@ export class MapsPage extends LoadedPage<EmapRecord[]> {
   #rows: MapRow[] = [];
 
   constructor(context: PageContext) {
-    super(context, "Maps", button("Add a map…", () => this.#add(), "primary"));
+    const devices = linkButton("Devices", settingsAddress("devices"));
+    const add = button("Add a map…", () => this.#add(), "primary");
+    super(context, "Maps", element("div", { class: "form-buttons" }, devices, add));
     this.#setup = new EmapSetup(context.server);
     this.#emaps = new Emaps(context.server);
     void this.start(
