@@ -16,7 +16,7 @@ namespace {
 constexpr const char* kPlayerApi = "VEXO.Lookhaven.Player";
 constexpr const char* kByFrames = "PlayMjpegEvent";
 constexpr const char* kByTimes = "PlayMjpegEventNoFrameId";
-constexpr int kUsualSideBySide = 4;
+constexpr int kUsualSideBySide = 9;  // three by three cameras of one moment
 constexpr int kMaxSideBySide = 16;
 
 int IntOr(const Call& call, const char* name, int fallback) {

@@ -10,7 +10,7 @@ namespace lookhaven::api {
 // True for the methods that start a player.
 bool IsPlayer(const Call& call);
 
-// How many players a session may have side by side: the setting players_per_session, 1 … 16, or 4. Throws
+// How many players a session may have side by side: the setting players_per_session, 1 … 16, or 9. Throws
 // store::StoreError.
 int PlayersPerSession(store::Store& records);
 

@@ -26,7 +26,7 @@ struct Setting {
 
 constexpr Setting kSettings[] = {
     {"login_port", 8080, 1, 65535, "the port that clients are given for a direct log-in"},
-    {"players_per_session", 4, 1, 16, "recorded events that one session may play side by side"},
+    {"players_per_session", 9, 1, 16, "recorded events that one session may play side by side"},
     {"marks_per_day", store::kMarksPerDay, 1, 1'000'000,
      "alerts and POS transactions that one account may report within 24 hours"}};
 

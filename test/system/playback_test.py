@@ -167,7 +167,7 @@ class PlaybackTest(unittest.TestCase):
 
     def test_an_older_player_gives_way(self):
         self.server.cli("setting", "set", "players_per_session", "1")
-        self.addCleanup(self.server.cli, "setting", "set", "players_per_session", "4")
+        self.addCleanup(self.server.cli, "setting", "set", "players_per_session", "9")
         cookie, other_cookie = self.server.login("admin"), self.server.login("admin")
         with playing(self.server, self.event["id"], cookie=other_cookie, playrate=-8) as other, \
              playing(self.server, self.event["id"], cookie=cookie, timestamp=1) as older:

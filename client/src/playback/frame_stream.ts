@@ -41,6 +41,8 @@ export async function readFrames(
       parser.push(read.value);
       for (const part of parts.splice(0)) {
         if (owner.aborted) return;
+        // A frame may wait until it is due.
+        deadline.suspend();
         if (!/^image\//.test(part.headers.get("content-type") ?? "")) index = indexOf(part, index);
         else if (!(await take(frameOf(part, index)))) return;
         deadline.extend();

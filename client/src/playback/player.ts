@@ -29,6 +29,8 @@ const kMaxSilenceMs = 8_000;
 const kRetryMs = 1_000;
 
 export class Player {
+  /** Resolves when a frame of a stream, of that Unix time in milliseconds, is to be shown; with false where it is to be left out. */
+  pace: (positionMs: number, signal: AbortSignal) => Promise<boolean> = () => Promise.resolve(true);
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
   show: (frame: RecordedFrame, signal: AbortSignal) => Promise<void> = async () => undefined;
   readonly #recordings: Recordings;
@@ -161,19 +163,15 @@ export class Player {
     this.#frameCount = Math.max(this.#frameCount, footage.frameCount);
   }
 
-  /** The frame to begin with; null when the server does not say, which has become the state. */
+  /** The frame to begin with; null when the server does not say, which has become the state, or where it is not wanted any more. */
   async #locate(start: Start, signal: AbortSignal): Promise<FrameStart | null> {
     if ("index" in start) return start;
-    try {
-      const footage = this.#footage!;
-      const { index, frameCount } = await this.#recordings.frameAt(footage, start.atMs);
-      if (signal.aborted) return null;
-      if (isSameFootage(footage, this.#footage)) this.#frameCount = frameCount;
-      return { index };
-    } catch (error) {
-      if (!signal.aborted) await this.#fail(error as ServerError, signal);
-      return null;
-    }
+    const footage = this.#footage!;
+    const found = await this.#recordings.frameAt(footage, start.atMs).catch((error: ServerError) => error);
+    if (signal.aborted) return null;
+    if (found instanceof ServerError) await this.#fail(found, signal);
+    else if (isSameFootage(footage, this.#footage)) this.#frameCount = found.frameCount;
+    return found instanceof ServerError ? null : { index: found.index };
   }
 
   #showStill(start: Start): void {
@@ -199,13 +197,11 @@ export class Player {
     const footage = this.#footage!;
     const start = await this.#locate(wanted, signal);
     if (!start) return false;
-    try {
-      await this.#stills.read(footage, start, (frame) => this.#showFrame(frame, signal), signal, kMaxSilenceMs);
-    } catch (error) {
-      if (!signal.aborted) await this.#fail(error as ServerError, signal);
-      return false;
-    }
-    return true;
+    const show = (frame: RecordedFrame) => this.#showFrame(frame, signal);
+    const read = this.#stills.read(footage, start, show, signal, kMaxSilenceMs);
+    const failure = await read.catch((error: ServerError) => error);
+    if (failure && !signal.aborted) await this.#fail(failure, signal);
+    return !failure;
   }
 
   async #play(start: Start): Promise<void> {
@@ -249,7 +245,7 @@ export class Player {
         if (before < 0 && this.#rate !== rate) this.#recordings.setRate(key, this.#rate).catch(() => undefined);
         before = frame.index;
         this.#state = { kind: "playing" };
-        await this.#showFrame(frame, signal);
+        if (await this.pace(this.#shown.positionOf(frame), signal)) await this.#showFrame(frame, signal);
         return !signal.aborted;
       },
       signal,

@@ -35,10 +35,15 @@ export class ShownFrame {
     this.#capturedMs = this.#positionMs = atMs;
   }
 
-  take({ index, capturedMs }: RecordedFrame): void {
+  /** The position at which a frame is to be shown that follows. */
+  positionOf({ index, capturedMs }: RecordedFrame): number {
     const isRepeated = capturedMs === this.#capturedMs && index > this.#index;
-    this.#positionMs = isRepeated ? this.#positionMs + (index - this.#index) * kMaxFrameMs : capturedMs;
-    this.#capturedMs = capturedMs;
-    this.#index = index;
+    return isRepeated ? this.#positionMs + (index - this.#index) * kMaxFrameMs : capturedMs;
+  }
+
+  take(frame: RecordedFrame): void {
+    this.#positionMs = this.positionOf(frame);
+    this.#capturedMs = frame.capturedMs;
+    this.#index = frame.index;
   }
 }

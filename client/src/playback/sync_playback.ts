@@ -1,54 +1,48 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Plays recordings of one or more cameras in sync, each in a player of its own, from one recording to the next.
+// Plays recordings of one or more cameras in step, from one recording to the next.
 //
-// Why so        Recordings of a camera follow each other without a gap, or with hours between. One player leads: its time is
-//               the playhead. Where its camera has no more, the playhead moves on to whatever comes next on any camera; the
-//               others join as soon as they have something at the playhead, and are realigned when they drift apart. A pause
-//               shows what each camera had at the time of the leading one's picture.
+// Why so        Recordings of a camera follow each other without a gap, or with hours between. One clock says which moment is
+//               shown; a camera that has nothing then joins as soon as it has. Where none has anything, the clock goes on to
+//               whatever comes next on any camera. One player leads: steps are frames of its camera, and a pause shows what
+//               each camera had at the time of its picture.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import type { FootageCache } from "./footage_cache";
-import { Player } from "./player";
+import { covers, FootageLookup, kMaxGapS } from "./footage_lookup";
+import { Tracks, type Track } from "./tracks";
 
-export interface Track {
-  readonly camera: number;
-  readonly player: Player;
-}
-
-/** Recordings this close to each other play as one. */
-const kMaxGapS = 3;
-/** How far a player may be from the playhead, and how often at most it is brought back. */
-const kMaxApartMs = 1_500;
+/** How often at most a player that was left behind is brought back. */
 const kRejoinIntervalMs = 5_000;
-/** How far ahead the next recording is looked for in what is known, before the server is asked. */
-const kLookAheadS = 600;
+/** Ends of recordings are rounded up to seconds: this much later there is surely nothing. */
+const kEndToleranceMs = 1_000;
 
 export class SyncPlayback {
-  readonly #recordings: Recordings;
-  readonly #cache: FootageCache;
+  readonly #lookup: FootageLookup;
   readonly #changed: () => void;
   readonly #skipped: (seconds: number) => void;
-  #tracks: Track[] = [];
+  readonly #tracks: Tracks;
   #lead: Track | null = null;
   #playheadMs: number | null = null;
   #isPlaying = false;
-  #rate = 1;
+  #isScrubbed = false;
   #isAdvancing = false;
+  /** Counts how often the user went elsewhere. */
+  #place = 0;
   /** When a track was last brought to the playhead, and where the playhead was. */
-  readonly #joined = new Map<Track, { clockMs: number; atMs: number }>();
+  readonly #joined = new WeakMap<Track, { clockMs: number; atMs: number }>();
 
   /** `changed` is called whenever there is something else to show; `skipped` when playing leaves out a gap of that length. */
   constructor(recordings: Recordings, cache: FootageCache, changed: () => void, skipped: (seconds: number) => void) {
-    this.#recordings = recordings;
-    this.#cache = cache;
+    this.#tracks = new Tracks(recordings, (track) => this.#follow(track));
+    this.#lookup = new FootageLookup(recordings, cache);
     this.#changed = changed;
     this.#skipped = skipped;
   }
 
   get tracks(): readonly Track[] {
-    return this.#tracks;
+    return this.#tracks.all;
   }
 
   get lead(): Track | null {
@@ -64,193 +58,203 @@ export class SyncPlayback {
     return this.#isPlaying;
   }
 
-  get rate(): number {
-    return this.#rate;
+  /** The playhead is being dragged. */
+  get isScrubbed(): boolean {
+    return this.#isScrubbed;
   }
 
-  /** Plays these cameras, in this order; those that stay play on. */
+  get rate(): number {
+    return this.#tracks.rate;
+  }
+
+  /** What the camera has at a time, as far as is known. */
+  footageAt(camera: number, atMs: number): Footage | null {
+    return this.#lookup.at(camera, atMs);
+  }
+
+  /** Plays these cameras; those that stay play on, and the players of the others end. */
   setCameras(cameras: readonly number[]): void {
-    const before = this.#tracks;
-    this.#tracks = cameras.map((camera) => before.find((track) => track.camera === camera) ?? this.#newTrack(camera));
-    for (const track of before) if (!this.#tracks.includes(track)) track.player.close();
-    if (!this.#lead || !this.#tracks.includes(this.#lead)) this.#lead = this.#tracks[0] ?? null;
-    for (const track of this.#tracks) if (!before.includes(track)) this.#join(track, this.#isPlaying);
+    const added = this.#tracks.setCameras(cameras);
+    this.#lead = this.#tracks.of(this.#lead?.camera) ?? this.tracks[0] ?? null;
+    for (const track of added) this.#join(track, this.#isPlaying);
+    this.#changed();
+  }
+
+  setLead(camera: number): void {
+    this.#lead = this.#tracks.of(camera) ?? this.#lead;
     this.#changed();
   }
 
   /** Plays a recording of one of the cameras, and what the others have at that time. */
   open(footage: Footage, atMs = footage.start * 1000, isPlaying = true): void {
-    const track = this.#tracks.find(({ camera }) => camera === footage.camera);
+    const track = this.#tracks.of(footage.camera);
     if (!track) return;
     this.#lead = track;
-    this.#playheadMs = atMs;
-    this.#isPlaying = isPlaying;
-    track.player.setRate(this.#rate);
-    track.player.open(footage, atMs, isPlaying);
-    for (const other of this.#tracks) if (other !== track) this.#join(other, isPlaying);
+    this.#goTo(atMs, isPlaying);
+    this.#tracks.start(track, footage, atMs, isPlaying);
+    for (const other of this.tracks) if (other !== track) this.#join(other, isPlaying);
     this.#changed();
   }
 
-  /** Goes to a time, preferably in what is being played, then on `camera`. */
+  /** Goes to a time of all cameras, of which `camera` leads; in a mark that is played, where it has that time. */
   seek(atMs: number, camera = this.#lead?.camera, isPlaying = this.#isPlaying): void {
     const current = this.#lead?.player.footage;
     const isInMark = current && current.kind !== "event" && current.camera === camera && covers(current, atMs);
-    const order = [...this.#tracks].sort((one) => (one.camera === camera ? -1 : 1));
-    for (const track of order) {
-      const footage = isInMark ? current : this.#at(track.camera, atMs);
-      if (footage) return this.open(footage, atMs, isPlaying);
-    }
-    // None of the cameras has a recording there.
+    const wanted = isInMark ? current : camera === undefined ? null : this.#lookup.at(camera, atMs);
+    if (wanted) return this.open(wanted, atMs, isPlaying);
+    this.#lead = this.#tracks.of(camera) ?? this.#lead;
+    const hasAny = this.tracks.some((track) => this.#lookup.at(track.camera, atMs));
+    this.#goTo(atMs, isPlaying && hasAny);
+    for (const track of this.tracks) this.#join(track, this.#isPlaying);
+    this.#changed();
+  }
+
+  /** The playhead is dragged: it moves, and nothing plays until `seek` or `open`. */
+  scrub(atMs: number): void {
+    if (!this.#isScrubbed) this.pause();
+    this.#isScrubbed = true;
     this.#playheadMs = atMs;
-    this.#isPlaying = false;
-    for (const track of this.#tracks) track.player.close();
     this.#changed();
   }
 
   play(): void {
-    if (this.#playheadMs === null) return;
-    this.#isPlaying = true;
+    const atMs = this.#playheadMs;
+    if (atMs === null) return;
     const lead = this.#lead?.player;
-    if (!lead?.footage) void this.#advance();
-    else if (lead.state.kind === "ended") void this.#advance(() => lead.play());
-    else for (const { player } of this.#tracks) player.play();
+    const ended = lead?.state.kind === "ended" ? lead.footage : null;
+    this.#goTo(atMs, true);
+    for (const track of this.tracks) {
+      if (track.player.state.kind === "ended") void this.#goOn(track, false);
+      else if (!this.#tracks.resume(track, atMs)) this.#join(track, true);
+    }
+    if (!this.#tracks.hasActive) void this.#advance(() => (ended ? this.open(ended) : this.pause()));
     this.#changed();
   }
 
   pause(): void {
     this.#isPlaying = false;
-    for (const { player } of this.#tracks) player.pause();
+    this.#tracks.pause();
     this.#changed();
   }
 
   /** Pauses, and moves by frames of the leading camera. */
   step(by: number): void {
-    if (!this.#lead) return;
     if (this.#isPlaying) this.pause();
-    this.#lead.player.step(by);
+    this.#lead?.player.step(by);
   }
 
   setRate(rate: number): void {
-    this.#rate = rate;
-    for (const { player } of this.#tracks) player.setRate(rate);
+    this.#tracks.setRate(rate);
     this.#changed();
   }
 
-  /** Call it a few times a second: lets cameras join, and realigns those that have drifted. */
+  /** Call it a few times a second: lets cameras join that have something now, and those that were left behind. */
   tick(): void {
-    const playheadMs = this.#playheadMs;
-    if (!this.#isPlaying || playheadMs === null) return;
-    void this.#cache.load(
-      this.#tracks.map(({ camera }) => camera),
-      playheadMs / 1000,
-      playheadMs / 1000 + 600,
-    );
-    for (const track of this.#tracks) {
-      if (track === this.#lead || performance.now() - (this.#joined.get(track)?.clockMs ?? -Infinity) < kRejoinIntervalMs) continue;
-      const { state, positionMs } = track.player;
-      const isIdle = state.kind === "empty" || state.kind === "ended";
-      const isApart = state.kind === "playing" && Math.abs(positionMs - playheadMs) > kMaxApartMs;
-      if (isIdle || isApart) this.#join(track, true);
+    if (!this.#isPlaying) return;
+    const atMs = this.#tracks.clock.atMs;
+    if (this.#lead?.player.state.kind !== "playing") this.#playheadMs = atMs;
+    void this.#lookup.load(this.#tracks.cameras, atMs);
+    for (const track of this.tracks) {
+      const { state, footage } = track.player;
+      // A picture of another time must not be taken for one of now.
+      if (state.kind === "ended" && footage && atMs > footage.stop * 1000 + kEndToleranceMs) track.player.close();
+      const isDue = track.player.state.kind === "empty" && this.#lookup.at(track.camera, atMs);
+      if (isDue || (this.#tracks.clock.isLeftBehind(track) && this.#mayRejoin(track))) this.#join(track, true);
     }
+    if (!this.#tracks.hasActive) void this.#advance();
+    this.#changed();
   }
 
+  /** Ends all, and has nothing to show any more. */
   close(): void {
-    this.#isPlaying = false;
-    for (const { player } of this.#tracks) player.close();
+    this.#goTo(0, false);
+    this.#playheadMs = null;
+    this.#tracks.close();
   }
 
-  #newTrack(camera: number): Track {
-    const track: Track = { camera, player: new Player(this.#recordings, () => this.#follow(track)) };
-    track.player.setRate(this.#rate);
-    return track;
+  #goTo(atMs: number, isPlaying: boolean): void {
+    this.#place += 1;
+    this.#isScrubbed = false;
+    this.#playheadMs = atMs;
+    this.#isPlaying = isPlaying;
+    this.#tracks.clock.set(atMs, isPlaying);
   }
 
   #follow(track: Track): void {
-    if (!this.#tracks.includes(track)) return;
     const { state, timeMs, positionMs, footage, rate } = track.player;
-    if (track === this.#lead && footage) {
+    if (track === this.#lead && footage && !this.#isScrubbed) {
       if (state.kind === "playing") this.#playheadMs = positionMs;
       if (state.kind === "paused") this.#playheadMs = timeMs;
-      if (state.kind === "ended" && this.#isPlaying) void this.#advance();
-      if (state.kind === "failed" || state.kind === "preempted") this.#isPlaying = false;
-      // A player slows down when it comes to the end of what is still being recorded.
-      if (state.kind === "playing" && rate !== this.#rate) this.#rate = rate;
       if (state.kind === "paused" && !this.#isPlaying) this.#alignOthers();
+    }
+    if (this.#isPlaying) {
+      // A player slows down when it comes to the end of what is still being recorded.
+      if (state.kind === "playing" && rate !== this.rate) this.#tracks.setRate(rate);
+      if (state.kind === "ended") void this.#goOn(track, true);
+      if (/failed|preempted/.test(state.kind) && !this.#tracks.hasActive) this.#isPlaying = false;
     }
     this.#changed();
   }
 
   #alignOthers(): void {
-    for (const other of this.#tracks) {
+    for (const other of this.tracks) {
       if (other === this.#lead || this.#playheadMs === null) continue;
       if (this.#joined.get(other)?.atMs !== this.#playheadMs) this.#join(other, false);
     }
   }
 
+  #mayRejoin(track: Track): boolean {
+    return performance.now() - (this.#joined.get(track)?.clockMs ?? -Infinity) >= kRejoinIntervalMs;
+  }
+
   /** Shows what the camera has at the playhead. What is not known of it is looked up first. */
   #join(track: Track, isPlaying: boolean, isKnown = false): void {
-    const atMs = this.#playheadMs;
-    if (atMs === null) return;
+    if (this.#playheadMs === null) return;
+    const atMs = isPlaying ? this.#tracks.clock.atMs : this.#playheadMs;
     const joined = { clockMs: performance.now(), atMs };
     this.#joined.set(track, joined);
-    const footage = this.#at(track.camera, atMs);
-    if (footage) return track.player.open(footage, atMs, isPlaying);
+    const footage = this.#lookup.at(track.camera, atMs);
+    if (footage) return this.#tracks.start(track, footage, atMs, isPlaying);
     if (track.player.footage) track.player.close();
     if (isKnown) return;
-    void this.#cache.load([track.camera], atMs / 1000, atMs / 1000 + 1, true).then(() => {
+    void this.#lookup.load([track.camera], atMs, true).then(() => {
       // Meanwhile it may have joined elsewhere.
-      const isWanted = this.#joined.get(track) === joined && this.#tracks.includes(track) && track !== this.#lead;
-      if (isWanted && this.#at(track.camera, atMs)) this.#join(track, this.#isPlaying, true);
+      const isWanted = this.#joined.get(track) === joined && this.tracks.includes(track) && !track.player.footage;
+      if (isWanted && this.#lookup.at(track.camera, atMs)) this.#join(track, this.#isPlaying, true);
     });
   }
 
-  #at(camera: number, atMs: number): Footage | null {
-    return this.#events(camera, atMs / 1000, atMs / 1000).findLast((event) => covers(event, atMs)) ?? null;
-  }
-
-  #events(camera: number, fromS: number, toS: number): Footage[] {
-    return this.#cache.get(camera, fromS, toS).footage.filter(({ kind, isSaved }) => kind === "event" && isSaved);
+  /** Plays what follows a recording that has ended. A mark is played by itself: with `mayStop` its end is a pause. */
+  async #goOn(track: Track, mayStop: boolean): Promise<void> {
+    const ended = track.player.footage;
+    if (ended?.kind !== "event") return mayStop && track === this.#lead ? this.pause() : undefined;
+    const next = await this.#lookup.following(ended);
+    const isWanted = this.#isPlaying && this.tracks.includes(track) && track.player.footage === ended;
+    if (!isWanted || track.player.state.kind !== "ended") return;
+    if (next) this.#tracks.start(track, next, next.start * 1000, true);
+    else if (!this.#tracks.hasActive) await this.#advance();
   }
 
   /** Plays what comes after the playhead; where nothing does, calls `otherwise`, or stops. */
-  async #advance(otherwise?: () => void): Promise<void> {
+  async #advance(otherwise = () => this.pause()): Promise<void> {
     if (this.#isAdvancing) return;
     this.#isAdvancing = true;
     try {
-      const current = this.#lead?.player.footage ?? null;
-      const next = current && current.kind !== "event" ? null : await this.#next(current);
+      const [place, fromMs, ended] = [this.#place, this.#tracks.clock.atMs, this.#tracks.ended];
+      const ends = ended.map(({ stop }) => stop).filter((stop) => stop * 1000 <= fromMs + kEndToleranceMs);
+      const fromS = Math.max(fromMs / 1000, ...ends);
+      const current = this.#lead?.player.footage ?? ended[0] ?? null;
+      // After a mark nothing follows by itself.
+      const isMark = current !== null && current.kind !== "event";
+      const next = isMark ? null : await this.#lookup.next(this.#tracks.cameras, fromS, current);
       // Meanwhile the user may have gone elsewhere.
-      if (!this.#isPlaying || (this.#lead?.player.footage ?? null) !== current) return;
-      const gapS = next && current ? next.start - current.stop : 0;
-      if (gapS > kMaxGapS) this.#skipped(gapS);
-      // Another camera's may have begun long before; of the same one, ends are rounded up.
-      const fromS = current && next?.camera !== current.camera ? current.stop : 0;
-      if (next) this.open(next, Math.max(next.start, fromS) * 1000);
-      else if (otherwise) otherwise();
-      else this.#isPlaying = false;
+      if (!this.#isPlaying || this.#tracks.hasActive || this.#place !== place) return;
+      if (!next) return otherwise();
+      if (next.start - fromS > kMaxGapS && ended.length > 0) this.#skipped(next.start - fromS);
+      this.open(next, Math.max(next.start, fromS) * 1000);
     } finally {
       this.#isAdvancing = false;
       this.#changed();
     }
   }
-
-  async #next(current: Footage | null): Promise<Footage | null> {
-    const fromS = current?.stop ?? (this.#playheadMs ?? 0) / 1000;
-    const cameras = this.#tracks.map(({ camera }) => camera);
-    await this.#cache.load(cameras, fromS - 1, fromS + kLookAheadS, true);
-    const candidates = cameras.flatMap((camera) => {
-      const events = this.#events(camera, fromS - 1, fromS + kLookAheadS);
-      const isNext = ({ id, start, stop }: Footage) => id !== current?.id && stop > fromS && start >= (current?.start ?? fromS);
-      return events.find(isNext) ?? [];
-    });
-    const followsAtOnce = candidates.find(({ camera, start }) => camera === current?.camera && start <= fromS + kMaxGapS);
-    const known = followsAtOnce ?? candidates.sort((one, other) => one.start - other.start)[0];
-    if (known) return known;
-    const place = { atS: Math.floor(fromS), id: current?.id };
-    return this.#recordings.next({ cameras, kinds: ["continuous", "alarm"], ...place }, false).catch(() => null);
-  }
-}
-
-function covers({ start, stop, isGrowing }: Footage, atMs: number): boolean {
-  return start * 1000 <= atMs && atMs < stop * 1000 + (isGrowing ? kMaxGapS * 1000 : 0);
 }

@@ -8,7 +8,7 @@ export class Deadline {
   readonly #onOwnerAbort = () => this.#abort.abort();
   #timer: ReturnType<typeof setTimeout> | undefined;
 
-  /** Runs from now on; call `extend` when data comes, and `release` at the end. */
+  /** Runs from now on; call `extend` when data comes, `suspend` while none is read, and `release` at the end. */
   constructor(
     readonly timeoutMs: number,
     owner?: AbortSignal,
@@ -27,6 +27,11 @@ export class Deadline {
   extend(): void {
     clearTimeout(this.#timer);
     this.#timer = setTimeout(() => this.#abort.abort(), this.timeoutMs);
+  }
+
+  /** Until `extend` is called. */
+  suspend(): void {
+    clearTimeout(this.#timer);
   }
 
   /** Closes the request as well, if it is still open. */

@@ -48,6 +48,12 @@ export interface EventPlace {
   id?: number | undefined;
 }
 
+/** `capturedMs`: Unix milliseconds. */
+export interface Still {
+  jpeg: Blob;
+  capturedMs: number;
+}
+
 export interface FrameOfTime {
   index: number;
   /** Of the whole footage, now. */
@@ -184,10 +190,20 @@ export class Recordings {
     return event.kind === "event" ? footageOf(event, event.camera_id) : markOf(event);
   }
 
-  /** The picture that the footage shows at its moment, or so; at least that wide unless the camera's are smaller. */
-  stillAddress({ kind, id, moment }: Footage, widthPx: number): string {
-    const which = { event: String(id), ...kindParameter(kind), time_ms: String(moment * 1000), width: String(widthPx) };
-    return address("VEXO.Picture", "At", which);
+  /** The picture that the footage shows at a time, or so; at least that wide unless the camera's are smaller. */
+  stillAddress(footage: FootageRef, atMs: number, widthPx: number): string {
+    return address("VEXO.Picture", "At", stillParameters(footage, atMs, widthPx));
+  }
+
+  /** The same, as it is fetched. Rejects with a ServerError. */
+  async still(footage: FootageRef, atMs: number, widthPx: number, signal: AbortSignal): Promise<Still> {
+    try {
+      const answer = await this.#server.media("VEXO.Picture", "At", stillParameters(footage, atMs, widthPx), { signal });
+      const capturedMs = Number(answer.headers.get("X-Capture-Time")) * 1000;
+      return { jpeg: await answer.blob(), capturedMs: capturedMs > 0 ? Math.round(capturedMs) : atMs };
+    } catch (error) {
+      throw asServerError(error);
+    }
   }
 
   /**
@@ -223,4 +239,8 @@ export class Recordings {
   async setRate(key: number, rate: number): Promise<void> {
     await this.#server.call("VEXO.Playback", "SetRate", {}, { form: { timestamp: String(key), rate: String(rate) } });
   }
+}
+
+function stillParameters({ kind, id }: FootageRef, atMs: number, widthPx: number): Record<string, string> {
+  return { event: String(id), ...kindParameter(kind), time_ms: String(Math.round(atMs)), width: String(widthPx) };
 }

@@ -15,10 +15,11 @@ const kDefaultCameras = 8;
 const kMaxCameras = 32;
 const kStorageKey = "lookhaven.events";
 
-interface Stored {
-  cameras?: number[];
-  kinds?: EventKind[];
-  isKeptOnly?: boolean;
+/** What is listed. */
+export interface FilterChoice {
+  cameras: readonly number[];
+  kinds: readonly EventKind[];
+  isKeptOnly: boolean;
 }
 
 export class EventFilter {
@@ -31,12 +32,13 @@ export class EventFilter {
   #chosen = new Set<number>();
   #kinds = new Set<EventKind>(kEventKinds);
   #isKeptOnly = false;
+  readonly #boxes = new Map<EventKind | "kept", HTMLInputElement>();
 
   /** `search` is a part of it that has a place of its own. */
   constructor(changed: () => void, search: HTMLElement) {
     this.#changed = changed;
     const stored = readStored();
-    if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds!.includes(kind)));
+    if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds?.includes(kind)));
     if (stored.cameras) this.#chosen = new Set(stored.cameras);
     this.#isKeptOnly = stored.isKeptOnly ?? false;
     const kinds = kEventKinds.map((kind) => {
@@ -46,6 +48,7 @@ export class EventFilter {
         else this.#kinds.delete(kind);
         this.#save();
       });
+      this.#boxes.set(kind, box);
       return element("label", { class: "chip" }, box, element("span", { class: "row-swatch", "data-kind": kind }), kKindNames[kind]);
     });
     const cameras = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
@@ -55,6 +58,20 @@ export class EventFilter {
 
   get cameras(): Camera[] {
     return this.#cameras.filter(({ id }) => this.#chosen.has(id));
+  }
+
+  get choice(): FilterChoice {
+    return { cameras: [...this.#chosen], kinds: [...this.#kinds], isKeptOnly: this.#isKeptOnly };
+  }
+
+  /** Shows what a link asks for; the user's own choice comes back at the next visit. */
+  follow({ cameras, kinds, isKeptOnly }: FilterChoice): void {
+    this.#chosen = new Set(cameras.slice(0, kMaxCameras));
+    this.#kinds = new Set(kinds);
+    this.#isKeptOnly = isKeptOnly;
+    for (const [kind, box] of this.#boxes) box.checked = kind === "kept" ? isKeptOnly : this.#kinds.has(kind);
+    this.setCameras(this.#cameras);
+    this.#changed();
   }
 
   get kinds(): ReadonlySet<EventKind> {
@@ -103,6 +120,7 @@ export class EventFilter {
       this.#isKeptOnly = box.checked;
       this.#save();
     });
+    this.#boxes.set("kept", box);
     return element("label", { class: "chip", title: "Only recordings that are kept" }, box, icon("kept"), "Kept");
   }
 
@@ -123,15 +141,14 @@ export class EventFilter {
   }
 
   #save(): void {
-    const stored: Stored = { cameras: [...this.#chosen], kinds: [...this.#kinds], isKeptOnly: this.#isKeptOnly };
-    localStorage.setItem(kStorageKey, JSON.stringify(stored));
+    localStorage.setItem(kStorageKey, JSON.stringify(this.choice));
     this.#changed();
   }
 }
 
-function readStored(): Stored {
+function readStored(): Partial<FilterChoice> {
   try {
-    return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Stored | null) ?? {};
+    return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Partial<FilterChoice> | null) ?? {};
   } catch {
     return {};
   }

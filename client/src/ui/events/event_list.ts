@@ -4,6 +4,7 @@
 
 import { kindOf, type EventKind } from "../../playback/coverage";
 import { describe, isSameFootage, type Footage, type FootageRef } from "../../wire/footage";
+import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
@@ -35,9 +36,15 @@ function foundLines(found: readonly (readonly string[])[]): (Node | string)[] {
   ]);
 }
 
+export interface EventListActions {
+  open(footage: Footage): void;
+  /** Shows what other cameras have at the moment of the event. */
+  sameMoment(footage: Footage): void;
+}
+
 export class EventList {
   readonly root: HTMLElement;
-  readonly #onOpen: (footage: Footage) => void;
+  readonly #actions: EventListActions;
   readonly #nameOf: (camera: number) => string;
   readonly #stillAddress: (footage: Footage, widthPx: number) => string;
   readonly #stills = new StillLoader();
@@ -55,11 +62,11 @@ export class EventList {
   constructor(
     nameOf: (camera: number) => string,
     stillAddress: (footage: Footage, widthPx: number) => string,
-    onOpen: (footage: Footage) => void,
+    actions: EventListActions,
   ) {
     this.#nameOf = nameOf;
     this.#stillAddress = stillAddress;
-    this.#onOpen = onOpen;
+    this.#actions = actions;
     this.#box.append(this.#space, this.#note);
     this.root = element("section", { class: "list", "aria-label": "Events" }, this.#head, this.#box);
     this.#box.addEventListener("scroll", () => this.#render());
@@ -137,16 +144,19 @@ export class EventList {
     const still = element("img", { class: "row-still", alt: "" });
     const kept = element("span", { class: "row-kept" }, icon("kept"), element("span", { class: "unseen" }, "kept"));
     const button = element("button", { type: "button", class: "row-open" }, ...parts, still, kept);
-    const row = element("div", { class: "row", role: "listitem", "data-ref": `${one.kind}${one.id}` }, button);
-    button.addEventListener("click", () => {
+    const shown = (act: (footage: Footage) => void) => () => {
       const one = this.#footage[Number(row.dataset["at"])];
-      if (one) this.#onOpen(one);
-    });
+      if (one) act(one);
+    };
+    const all = iconButton("sameMoment", "Same moment on all cameras", shown((footage) => this.#actions.sameMoment(footage)));
+    all.classList.add("row-all");
+    const row = element("div", { class: "row", role: "listitem", "data-ref": `${one.kind}${one.id}` }, button, all);
+    button.addEventListener("click", shown((footage) => this.#actions.open(footage)));
     return row;
   }
 
   #fill(row: HTMLElement, one: Footage, at: number, rowPx: number): void {
-    const button = row.firstElementChild as HTMLButtonElement;
+    const [button, all] = [...row.children] as [HTMLButtonElement, HTMLButtonElement];
     const [swatch, time, name, text, side] = [...button.children] as [HTMLElement, HTMLElement, HTMLElement, HTMLElement, HTMLElement];
     const kind = kindOf(one);
     row.dataset["at"] = String(at);
@@ -161,7 +171,8 @@ export class EventList {
     side.classList.toggle("recording", one.isGrowing);
     button.querySelector<HTMLElement>(".row-kept")!.hidden = !one.isKept;
     button.disabled = !one.isSaved;
-    button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
+    all.disabled = !one.isSaved;
+    all.tabIndex = button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
     button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describe(one)].filter(Boolean).join("\n");
     button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
     // A mark's footage may come later than its row.

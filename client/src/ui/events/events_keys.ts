@@ -4,13 +4,21 @@
 
 import { hasFocusByPointer } from "../widgets/key_owner";
 import type { KeyList } from "../widgets/keys_dialog";
-import type { TransportActions } from "./transport";
+import type { StageLayout } from "./stage_layout";
+import { kJumpMs, type TransportActions } from "./transport";
 
 export const kEventsKeys: KeyList = [
   ["Space", "Play or pause"],
   ["Left Right", "One frame back or on; with Shift ten"],
+  ["J L", "Ten seconds back or on"],
   ["Up Down", "The event before or after"],
   ["[ ]", "Slower or faster"],
+  ["T", "Go to a time"],
+  ["A", "Same moment on all cameras"],
+  ["Enter", "The picture that leads large, or all again"],
+  ["1 2 3", "One camera, two by two, three by three"],
+  ["N", "Live"],
+  ["Left Right", "On the timeline: move the playhead; it plays from where it is let go"],
   ["+ -", "On the timeline: show less or more time"],
   ["PageUp PageDown", "On the timeline: earlier or later"],
   ["End", "On the timeline: now"],
@@ -21,8 +29,11 @@ export const kEventsKeys: KeyList = [
 export interface EventsActions extends TransportActions {
   /** To the next slower (-1) or faster (1) rate. */
   changeRate(by: 1 | -1): void;
-  /** False where it is not open. */
-  closeExport(): boolean;
+  layout(layout: StageLayout): void;
+  /** Shows the leading camera alone, or all again; false where there is but one. */
+  enlarge(): boolean;
+  /** Closes what was opened last, export or large picture; false where nothing was. */
+  back(): boolean;
 }
 
 /** Does what the key asks for; false for one that means nothing here, or that belongs to what has the focus. */
@@ -35,17 +46,30 @@ export function pressEventsKey(event: KeyboardEvent, actions: EventsActions): bo
   else if (event.key === "ArrowDown") actions.skip(1);
   else if (event.key === "[") actions.changeRate(-1);
   else if (event.key === "]") actions.changeRate(1);
-  else if (event.key.toLowerCase() === "x") actions.exportSpan();
-  else if (event.key === "Escape") return actions.closeExport();
-  else if (event.key.toLowerCase() === "f") actions.fullScreen();
+  else if (event.key === "Enter") return actions.enlarge();
+  else if (event.key === "Escape") return actions.back();
+  else return pressLetter(event.key.toLowerCase(), actions);
+  return true;
+}
+
+function pressLetter(key: string, actions: EventsActions): boolean {
+  if (key === "x") actions.exportSpan();
+  else if (key === "f") actions.fullScreen();
+  else if (key === "j") actions.jump(-kJumpMs);
+  else if (key === "l") actions.jump(kJumpMs);
+  else if (key === "t") actions.askTime();
+  else if (key === "a") actions.sameMoment();
+  else if (key === "n") actions.live();
+  else if (/^[123]$/.test(key)) actions.layout(Number(key) as StageLayout);
   else return false;
   return true;
 }
 
-/** From day to day and from row to row, for whoever came there with the keyboard. */
+/** From day to day, from row to row and along the timeline, for whoever came there with the keyboard. */
 function isForPart(event: KeyboardEvent): boolean {
   const target = event.target as Element;
   const isWithin = (selector: string) => !hasFocusByPointer() && target.closest(selector) !== null;
   if (event.key.startsWith("Arrow") && (isWithin(".calendar-days") || target.closest(".span-handle"))) return true;
+  if (/^Arrow(Left|Right)$/.test(event.key) && isWithin(".timeline-lanes")) return true;
   return /^Arrow(Up|Down)$/.test(event.key) && isWithin(".list-space");
 }

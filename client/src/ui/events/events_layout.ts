@@ -22,9 +22,10 @@ export class EventsLayout {
     const { timeline, calendar, filter, list } = overview;
     const zoom = element(
       "div",
-      { class: "timeline-zoom", role: "group", "aria-label": "Zoom" },
+      { class: "timeline-zoom", role: "group", "aria-label": "Span of the timeline" },
       iconButton("zoomOut", "Show more time", () => timeline.zoom(kZoomStep), "-"),
       iconButton("zoomIn", "Show less time", () => timeline.zoom(1 / kZoomStep), "+"),
+      iconButton("now", "Show now", () => timeline.showNow()),
     );
     transport.root.append(zoom);
     const side = element("div", { class: "side" }, calendar.root, filter.root, list.root);

@@ -17,7 +17,8 @@ import { TextSearch } from "./text_search";
 
 const kSettleMs = 150;
 
-export interface OverviewActions extends TimelineActions {
+export interface OverviewActions extends Omit<TimelineActions, "stillAddress"> {
+  sameMoment(footage: Footage): void;
   /** Other cameras or kinds of events were chosen. */
   filtered(): void;
   dayPicked(): void;
@@ -44,10 +45,11 @@ export class Overview {
     this.filter = new EventFilter(() => actions.filtered(), this.#search.root);
     this.list = new EventList(
       (camera) => this.nameOf(camera),
-      (footage, widthPx) => recordings.stillAddress(footage, widthPx),
-      (footage) => actions.open(footage),
+      (footage, widthPx) => recordings.stillAddress(footage, footage.moment * 1000, widthPx),
+      actions,
     );
-    this.timeline = new Timeline(this.cache, this.#days, { ...actions, moved: () => this.#onMoved() });
+    const stillAddress = recordings.stillAddress.bind(recordings);
+    this.timeline = new Timeline(this.cache, this.#days, { ...actions, stillAddress, moved: () => this.#onMoved() });
     this.calendar = new Calendar(this.#days, () => this.#chosen, (dayMs) => this.#pickDay(dayMs));
   }
 

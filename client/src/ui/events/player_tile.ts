@@ -1,13 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One player on the stage: its picture with camera and time, and the reason where there is no picture.
+// One player on the stage: its picture with camera and time, and the reason where there is no picture. While the playhead is
+// dragged it shows stills.
 
 import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";
+import type { Still } from "../../wire/recordings";
+import { iconButton } from "../widgets/button";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { magnify } from "../widgets/magnify";
 import { clockTime, preciseTime, shortDate } from "../widgets/text";
+
+export interface PlayerTileActions {
+  /** Plays what has stopped. */
+  again(): void;
+  /** The tile was clicked: its camera leads. */
+  choose(): void;
+  /** Shows it large, or all again; false where it is the only one. */
+  enlarge(): boolean;
+  close(): void;
+}
 
 export class PlayerTile {
   readonly root: HTMLElement;
@@ -16,20 +29,17 @@ export class PlayerTile {
   readonly #time = element("time", { class: "stage-time" });
   readonly #sentence = element("p", { class: "message-sentence", role: "status" });
   readonly #again = element("button", { type: "button", class: "button" });
+  readonly #large: HTMLButtonElement;
+  /** The still that is shown while the playhead is dragged: undefined while it is not, null where there is none. */
+  #still: Still | null | undefined;
+  #stills = 0;
 
-  /** `onAgain` is called when the user wants to play what has stopped. */
-  constructor(name: string, player: Player, onAgain: () => void) {
+  constructor(name: string, player: Player, actions: PlayerTileActions) {
     this.player = player;
-    player.show = async ({ jpeg }, signal) => {
-      const image = await createImageBitmap(jpeg);
-      // A pause while it was being decoded keeps the previous frame, whose number the player reports.
-      if (!signal.aborted) {
-        draw(this.#canvas, image);
-        this.root.classList.add("has-picture");
-      }
-      image.close();
-    };
-    this.#again.addEventListener("click", onAgain);
+    player.show = ({ jpeg }, signal) => this.#draw(jpeg, () => !signal.aborted);
+    this.#again.addEventListener("click", actions.again);
+    this.#large = iconButton("fit", `${name} large`, () => actions.enlarge(), "Enter");
+    const buttons = element("div", { class: "stage-buttons" }, this.#large, iconButton("close", `Close ${name}`, () => actions.close()));
     const message = element(
       "div",
       { class: "message" },
@@ -39,23 +49,62 @@ export class PlayerTile {
       this.#again,
     );
     const caption = element("p", { class: "stage-caption" }, element("span", {}, name), this.#time);
-    this.root = element("figure", { class: "picture stage-picture" }, this.#canvas, caption, message);
+    this.root = element("figure", { class: "picture stage-picture" }, this.#canvas, caption, message, buttons);
     this.#canvas.setAttribute("aria-label", `Recording of ${name}`);
-    magnify(this.root, this.#canvas);
+    this.root.addEventListener("pointerdown", actions.choose);
+    magnify(this.root, this.#canvas, actions.enlarge);
     this.refresh(null);
+  }
+
+  /** How wide a picture is drawn, in pixels of the screen. */
+  get widthPx(): number {
+    return Math.round(this.root.clientWidth * devicePixelRatio);
+  }
+
+  set isLarge(isLarge: boolean) {
+    this.root.classList.toggle("is-large", isLarge);
+    this.#large.setAttribute("aria-pressed", String(isLarge));
+  }
+
+  set isLead(isLead: boolean) {
+    this.root.classList.toggle("is-lead", isLead);
   }
 
   /** `playheadMs` is named where nothing was recorded then. */
   refresh(playheadMs: number | null): void {
     const { state, footage, timeMs } = this.player;
-    this.root.dataset["state"] = state.kind;
+    const isScrubbed = this.#still !== undefined;
+    this.root.dataset["state"] = isScrubbed ? (this.#still ? "paused" : "empty") : state.kind;
     // A picture of another time must not be taken for this one.
-    if (state.kind === "empty") this.root.classList.remove("has-picture");
-    setText(this.#time, footage ? `${shortDate(timeMs)} ${preciseTime(timeMs)}` : "");
-    setText(this.#sentence, sentenceFor(state, playheadMs));
-    const again = state.kind === "preempted" ? "Play here" : state.kind === "failed" ? "Try again" : "";
+    if (this.root.dataset["state"] === "empty") this.root.classList.remove("has-picture");
+    const shownMs = isScrubbed ? this.#still?.capturedMs : footage ? timeMs : undefined;
+    setText(this.#time, shownMs === undefined ? "" : `${shortDate(shownMs)} ${preciseTime(shownMs)}`);
+    setText(this.#sentence, sentenceFor(isScrubbed ? { kind: "empty" } : state, playheadMs));
+    const again = isScrubbed ? "" : state.kind === "preempted" ? "Play here" : state.kind === "failed" ? "Try again" : "";
     setText(this.#again, again);
     this.#again.hidden = again === "";
+  }
+
+  /** Shows a still in place of what the player has, null for none then, until `showPlayer`. */
+  async showStill(still: Still | null): Promise<void> {
+    const number = (this.#stills += 1);
+    if (still) await this.#draw(still.jpeg, () => number === this.#stills).catch(() => undefined);
+    if (number === this.#stills) this.#still = still;
+  }
+
+  showPlayer(): void {
+    this.#stills += 1;
+    this.#still = undefined;
+  }
+
+  async #draw(jpeg: Blob, isWanted: () => boolean): Promise<void> {
+    const image = await createImageBitmap(jpeg);
+    // A pause while it was being decoded keeps the previous frame, whose number the player reports.
+    if (isWanted()) {
+      draw(this.#canvas, image);
+      this.root.classList.add("has-picture");
+    }
+    image.close();
   }
 }
 
@@ -63,7 +112,7 @@ function sentenceFor(state: PlayerState, playheadMs: number | null): string {
   switch (state.kind) {
     case "empty":
       if (playheadMs === null) return "Choose an event, or a time on the timeline.";
-      return `Nothing recorded at ${clockTime(playheadMs)}.`;
+      return `No recording at ${clockTime(playheadMs)}.`;
     case "failed":
       return state.reason;
     case "lost":

@@ -1,56 +1,152 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The pictures of the cameras that are played side by side, as many at most as the session may have players.
+// The pictures of the cameras that are played in step, in one cell, four or nine; as many at most as may be played at once.
 
+import { kStillWidths, type ScrubRequest } from "../../playback/scrub_stills";
 import type { SyncPlayback } from "../../playback/sync_playback";
+import type { Footage } from "../../wire/footage";
+import type { Still } from "../../wire/recordings";
+import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { PlayerTile } from "./player_tile";
+import { emptyCell } from "./stage_cell";
+import { inCell, planOf, showing, withCamera, withLayout, withoutCamera, type StageLayout, type StagePlan } from "./stage_layout";
 
 export class Stage {
-  readonly root = element("div", { class: "stage" });
+  readonly root = element("div", { class: "stage", role: "group", "aria-label": "Pictures" });
+  readonly maxPlayers: number;
   readonly #playback: SyncPlayback;
-  readonly #maxPlayers: number;
-  readonly #nameOf: (camera: number) => string;
   readonly #changed: () => void;
-  #tiles: PlayerTile[] = [];
+  readonly #tiles = new Map<number, PlayerTile>();
+  #cameras: readonly Camera[] = [];
+  #plan: StagePlan = planOf(1, [], 1);
+  #large: number | null = null;
 
-  /** `changed` is called when other cameras are on the stage. */
-  constructor(playback: SyncPlayback, maxPlayers: number, nameOf: (camera: number) => string, changed: () => void) {
+  /** `changed` is called when other cameras are on the stage, or they are in other places. */
+  constructor(playback: SyncPlayback, maxPlayers: number, changed: () => void) {
     this.#playback = playback;
-    this.#maxPlayers = maxPlayers;
-    this.#nameOf = nameOf;
+    this.maxPlayers = maxPlayers;
     this.#changed = changed;
   }
 
-  get cameras(): number[] {
-    return this.#playback.tracks.map(({ camera }) => camera);
+  /** All that may be put on the stage. */
+  setCameras(cameras: readonly Camera[]): void {
+    this.#cameras = cameras;
+    this.#arrange();
   }
 
-  show(cameras: readonly number[]): void {
-    const before = this.#tiles;
-    this.#playback.setCameras(cameras);
-    // A paused player does not draw its picture again, so its tile stays.
-    this.#tiles = this.#playback.tracks.map(({ camera, player }) => {
-      const kept = before.find((tile) => tile.player === player);
-      return kept ?? new PlayerTile(this.#nameOf(camera), player, () => this.#playback.play());
-    });
-    this.root.dataset["players"] = String(this.#tiles.length);
-    this.root.replaceChildren(...this.#tiles.map(({ root }) => root));
+  get plan(): StagePlan {
+    return this.#plan;
+  }
+
+  get cameras(): number[] {
+    return this.#plan.cells.filter((camera) => camera !== null);
+  }
+
+  /** The camera that is shown alone in a layout of several; null for none. */
+  get large(): number | null {
+    return this.#large;
+  }
+
+  /** The one that is dragged, enlarged and stepped through. */
+  get lead(): number | null {
+    return this.#large ?? this.#playback.lead?.camera ?? null;
+  }
+
+  show(plan: StagePlan, large: number | null = null): void {
+    this.#plan = planOf(plan.layout, plan.cells, this.maxPlayers);
+    this.#large = large !== null && this.cameras.includes(large) && plan.layout > 1 ? large : null;
+    this.#playback.setCameras(this.cameras);
+    this.#arrange();
     this.#changed();
   }
 
-  /** Gives the camera a player; the last camera makes room where there is none left. */
-  include(camera: number): void {
-    if (!this.cameras.includes(camera)) this.show([...this.cameras.slice(0, this.#maxPlayers - 1), camera]);
+  setLayout(layout: StageLayout): void {
+    this.show(withLayout(this.#plan, layout, this.lead, this.maxPlayers));
   }
 
-  /** Adds the camera, in place of the first where the stage is full, or removes it unless it is the only one. */
+  /** Gives the camera a player in the layout as it is; the leading camera makes room where there is none. */
+  include(camera: number): void {
+    if (this.cameras.includes(camera)) return;
+    this.show(showing(this.#plan, camera, this.lead, this.maxPlayers));
+  }
+
+  /** Adds the camera, in place of the leading one where no player is left, or closes it unless it is the only one. */
   toggle(camera: number): void {
-    if (!this.cameras.includes(camera)) this.show([...this.cameras, camera].slice(-this.#maxPlayers));
-    else if (this.cameras.length > 1) this.show(this.cameras.filter((one) => one !== camera));
+    if (this.cameras.includes(camera)) return this.remove(camera);
+    this.show(withCamera(this.#plan, camera, this.maxPlayers) ?? showing(this.#plan, camera, this.lead, this.maxPlayers));
+  }
+
+  remove(camera: number): void {
+    if (this.cameras.length > 1) this.show(withoutCamera(this.#plan, camera), this.#large === camera ? null : this.#large);
+  }
+
+  /** Shows a camera alone, or all again. False where there is but one cell. */
+  enlarge(camera: number | null = this.lead): boolean {
+    if (this.#plan.layout === 1 || camera === null) return false;
+    this.#large = this.#large === null ? camera : null;
+    if (this.#large !== null) this.#playback.setLead(camera);
+    this.#arrange();
+    this.#changed();
+    return true;
   }
 
   refresh(): void {
-    for (const tile of this.#tiles) tile.refresh(this.#playback.playheadMs);
+    for (const [camera, tile] of this.#tiles) {
+      tile.isLead = this.cameras.length > 1 && camera === this.lead;
+      tile.refresh(this.#playback.playheadMs);
+    }
+  }
+
+  /** What is to be fetched for a time: first of the picture that leads. */
+  stillsAt(atMs: number, find: (camera: number) => Footage | null): ScrubRequest[] {
+    const cameras = this.#large === null ? this.cameras : [this.#large];
+    const order = [...cameras].sort((one, other) => Number(other === this.lead) - Number(one === this.lead));
+    return order.map((camera) => {
+      const widthPx = this.#tiles.get(camera)?.widthPx ?? 0;
+      const width = kStillWidths.find((each) => each >= widthPx) ?? kStillWidths.at(-1)!;
+      return { camera, atMs, widthPx: width, footage: find(camera) };
+    });
+  }
+
+  async showStill(camera: number, still: Still | null): Promise<void> {
+    await this.#tiles.get(camera)?.showStill(still);
+    this.refresh();
+  }
+
+  /** Ends what `showStill` began. */
+  showPlayers(): void {
+    for (const tile of this.#tiles.values()) tile.showPlayer();
+    this.refresh();
+  }
+
+  #arrange(): void {
+    const tracks = this.#playback.tracks;
+    for (const [camera, tile] of this.#tiles) if (!tracks.some(({ player }) => player === tile.player)) this.#tiles.delete(camera);
+    // A paused player does not draw its picture again, so its tile stays.
+    for (const { camera, player } of tracks) if (!this.#tiles.has(camera)) this.#tiles.set(camera, this.#newTile(camera, player));
+    for (const [camera, tile] of this.#tiles) tile.isLarge = camera === this.#large;
+    this.root.dataset["layout"] = String(this.#plan.layout);
+    this.root.dataset["players"] = String(tracks.length);
+    this.root.classList.toggle("has-large", this.#large !== null);
+    this.root.replaceChildren(...this.#plan.cells.map((camera, at) => this.#tiles.get(camera ?? 0)?.root ?? this.#emptyCell(at)));
+    this.refresh();
+  }
+
+  #newTile(camera: number, player: PlayerTile["player"]): PlayerTile {
+    const name = this.#cameras.find(({ id }) => id === camera)?.name ?? `Camera ${camera}`;
+    return new PlayerTile(name, player, {
+      again: () => this.#playback.play(),
+      choose: () => this.#playback.setLead(camera),
+      enlarge: () => this.enlarge(camera),
+      close: () => this.remove(camera),
+    });
+  }
+
+  #emptyCell(at: number): HTMLElement {
+    const others = this.#cameras.filter(({ id }) => !this.cameras.includes(id));
+    const isFull = this.cameras.length >= this.maxPlayers;
+    const full = isFull ? `No more than ${this.maxPlayers} at once` : "";
+    return emptyCell(others, full, (camera) => this.show(inCell(this.#plan, at, camera)));
   }
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The transport controls below the stage: play, step, rate, what is playing, download.
+// The transport controls below the stage: play, step, rate, what is playing and ways to another moment, download.
 
 import type { EventWalk } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
@@ -20,10 +20,19 @@ export interface TransportActions {
   /** To the previous (-1) or next (1) event. */
   skip(by: 1 | -1): void;
   rate(rate: number): void;
-  now(): void;
+  /** By so many milliseconds. */
+  jump(ms: number): void;
+  /** To a time that is typed. */
+  askTime(): void;
+  /** Shows what other cameras have at this moment. */
+  sameMoment(): void;
+  live(): void;
   exportSpan(): void;
   fullScreen(): void;
 }
+
+export const kJumpMs = 10_000;
+const kNoTime = "Go to a time";
 
 export class Transport {
   readonly root: HTMLElement;
@@ -35,7 +44,7 @@ export class Transport {
   readonly #before: HTMLButtonElement;
   readonly #after: HTMLButtonElement;
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
-  readonly #time = element("time", { class: "transport-time" });
+  readonly #time = element("time", { class: "transport-time" }, kNoTime);
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
   readonly #download = element("a", { class: "icon-button", role: "link", "aria-label": "Download this recording", title: "Download this recording" });
@@ -63,17 +72,24 @@ export class Transport {
       "div",
       { class: "transport-buttons", role: "group", "aria-label": "Playback" },
       this.#before,
+      iconButton("jumpBack", "Ten seconds back", () => actions.jump(-kJumpMs), "J"),
       iconButton("stepBack", "Previous frame", () => actions.step(-1), "←"),
       this.#play,
       iconButton("stepForward", "Next frame", () => actions.step(1), "→"),
+      iconButton("jumpForward", "Ten seconds on", () => actions.jump(kJumpMs), "L"),
       this.#after,
       this.#rate,
     );
-    const about = element("div", { class: "transport-about" }, this.#time, this.#growing, this.#frame);
+    const goTo = element("button", { type: "button", class: "transport-go", title: `${kNoTime} (T)` }, this.#time);
+    goTo.addEventListener("click", () => actions.askTime());
+    const about = element("div", { class: "transport-about" }, goTo, this.#growing, this.#frame);
+    const live = element("button", { type: "button", class: "button transport-live", title: "To the live pictures (N)" }, "LIVE");
+    live.addEventListener("click", () => actions.live());
     const side = element(
       "div",
       { class: "transport-side" },
-      iconButton("now", "Go to now", () => actions.now()),
+      live,
+      iconButton("sameMoment", "Same moment on all cameras", () => actions.sameMoment(), "A"),
       keeping.root,
       this.#download,
       iconButton("export", "Export a span of several cameras", () => actions.exportSpan(), "X"),
@@ -90,7 +106,7 @@ export class Transport {
     this.#play.title = `${isPlaying ? "Pause" : "Play"} (Space)`;
     this.root.dataset["playing"] = String(isPlaying);
     if (this.#rate.value !== String(rate)) this.#rate.value = String(rate);
-    setText(this.#time, playheadMs === null ? "" : `${shortDate(playheadMs)} ${preciseTime(playheadMs)}`);
+    setText(this.#time, playheadMs === null ? kNoTime : `${shortDate(playheadMs)} ${preciseTime(playheadMs)}`);
     this.#name(this.#before, "Previous event", this.#walk.peek(-1), "↑");
     this.#name(this.#after, "Next event", this.#walk.peek(1), "↓");
     this.#growing.hidden = !footage?.isGrowing;

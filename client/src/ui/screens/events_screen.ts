@@ -2,20 +2,24 @@
 //
 // The recordings of all cameras: the stage with its players, the timeline below; calendar, filter and list beside.
 
+import { streamLimit } from "../../live/stream_budget";
 import { EventWalk, type Direction } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
 import { SyncPlayback } from "../../playback/sync_playback";
 import { Exports } from "../../wire/exports";
 import { isSameFootage, type Footage } from "../../wire/footage";
+import { protocol } from "../../wire/protocol";
 import { Recordings, type EventPlace } from "../../wire/recordings";
-import { ServerError } from "../../wire/server";
-import { eventText } from "../events/event_list";
+import { asServerError } from "../../wire/server";
+import { EventsJumps } from "../events/events_jumps";
 import { kEventsKeys, pressEventsKey, type EventsActions } from "../events/events_keys";
 import { EventsLayout } from "../events/events_layout";
-import { KeepButton } from "../events/keep_button";
 import { ExportPanel } from "../events/export_panel";
+import { KeepButton } from "../events/keep_button";
 import { Overview } from "../events/overview";
+import { Scrubbing } from "../events/scrubbing";
 import { Stage } from "../events/stage";
+import { StagePicker } from "../events/stage_picker";
 import { Transport } from "../events/transport";
 import { element, setText } from "../widgets/dom";
 import { toggleFullScreen } from "../widgets/full_screen";
@@ -23,16 +27,19 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { OncePerFrame } from "../widgets/once_per_frame";
 import { spanInWords } from "../widgets/text";
+import { parsePlace, recordPlace, type EventsPlace } from "./events_route";
 import { keepTrying } from "./keep_trying";
-import { openFootage, recordFootage } from "./route";
+import { showCamera } from "./route";
 import { Screen } from "./screen";
 import type { Session } from "./session";
 
 const kRefreshMs = 250;
 const kReloadIntervalMs = 5_000;
 const kDaysIntervalMs = 300_000;
-/** Four pictures fill a stage, and four streams are what a browser carries beside its other requests. */
-const kMaxPlayers = 4;
+/** Browsers refuse to change the address more often than a few times a second. */
+const kRecordMs = { standing: 500, playing: 1_000 };
+/** More are too small to see anything. */
+const kMaxPlayers = 9;
 
 export class EventsScreen extends Screen {
   readonly #recordings = new Recordings(this.server);
@@ -40,8 +47,10 @@ export class EventsScreen extends Screen {
   readonly #showing = new OncePerFrame(() => this.#showPlayback());
   readonly #overview = new Overview(this.#recordings, {
     seek: (atMs, camera) => this.#seek(atMs, camera),
-    open: (footage) => this.#open(footage),
-    scrub: (atMs) => this.#playback.seek(atMs),
+    open: (footage) => this.#jumps.open(footage),
+    sameMoment: (footage) => void this.#jumps.sameMoment(footage),
+    scrub: (atMs) => this.#scrubbing.to(atMs),
+    release: (atMs) => this.#scrubbing.release(atMs),
     toggle: (camera) => this.#stage.toggle(camera),
     moved: () => this.#showing.request(),
     choose: (span) => this.#export.setSpan(span),
@@ -57,35 +66,50 @@ export class EventsScreen extends Screen {
   readonly #walk = new EventWalk(this.#recordings, () => this.#place(), () => this.#showing.request());
   readonly #export = new ExportPanel(this.#exports, (span) => this.#overview.timeline.chooseSpan(span));
   readonly #stage: Stage;
+  readonly #picker: StagePicker;
+  readonly #scrubbing: Scrubbing;
+  readonly #jumps: EventsJumps;
   readonly #transport: Transport;
   readonly #layout: EventsLayout;
   readonly #status = element("p", { class: "bar-status" });
   readonly #actions: EventsActions = {
     toggle: () => this.#togglePlaying(),
     step: (by) => this.#playback.step(by),
-    skip: (by) => void this.#skip(by),
+    skip: (by) => void this.#jumps.skip(by),
+    jump: (ms) => this.#jumps.by(ms),
+    askTime: () => this.#jumps.ask(this.root),
+    sameMoment: () => void this.#jumps.sameMoment(null),
+    live: () => this.#goLive(),
+    layout: (layout) => this.#stage.setLayout(layout),
+    enlarge: () => this.#stage.enlarge(),
+    back: () => this.#closeExport() || (this.#stage.large !== null && this.#stage.enlarge()),
     rate: (rate) => this.#playback.setRate(rate),
     changeRate: (by) => this.#changeRate(by),
-    now: () => this.#overview.timeline.showNow(),
     exportSpan: () => this.#toggleExport(),
-    closeExport: () => this.#closeExport(),
     fullScreen: toggleFullScreen,
   };
-  /** What the address asks for while it is being looked up. */
-  #opening = "";
+  /** Counts what the address has asked for; while it is being looked up, the address is not written. */
+  #followed = 0;
+  #isFollowing = false;
+  /** What is shown next is an entry of its own in the history. */
+  #isNewEntry = false;
   /** Why there is no list of cameras; empty when there is. */
   #error = "";
 
   constructor(session: Session) {
     super("events", session);
-    const maxPlayers = Math.max(1, Math.min(session.account.players_per_session ?? 1, kMaxPlayers));
+    const limits = [session.account.players_per_session ?? 1, streamLimit(protocol()), kMaxPlayers];
+    const maxPlayers = Math.max(1, Math.min(...limits));
     const nameOf = (camera: number) => this.#overview.nameOf(camera);
-    this.#stage = new Stage(this.#playback, maxPlayers, nameOf, () => this.#showLanes());
+    this.#stage = new Stage(this.#playback, maxPlayers, () => this.#showLanes());
+    this.#picker = new StagePicker(maxPlayers, (layout) => this.#stage.setLayout(layout));
+    this.#scrubbing = new Scrubbing(this.#recordings, this.#playback, this.#stage);
+    this.#jumps = new EventsJumps(this.#playback, this.#overview, this.#stage, this.#walk, () => this.#leaveMoment());
     const changed = (footage: Footage) => this.#onKeepingChanged(footage);
     const keeping = new KeepButton(this.#recordings, this.#exports, session.account.is_manager, changed);
     this.#transport = new Transport(this.#playback, this.#walk, nameOf, keeping, this.#actions);
     this.#layout = new EventsLayout(this.#stage, this.#transport, this.#export, this.#overview);
-    this.addToBar(this.#status);
+    this.addToBar(this.#status, this.#picker.root);
     this.front.append(this.#layout.root, keeping.dialog);
     const onVisibility = () => this.#onVisibility();
     document.addEventListener("visibilitychange", onVisibility, { signal: this.closed });
@@ -98,6 +122,7 @@ export class EventsScreen extends Screen {
   override close(): void {
     super.close();
     this.#showing.cancel();
+    this.#scrubbing.close();
     this.#playback.close();
     this.#export.close();
     this.#overview.close();
@@ -145,6 +170,7 @@ export class EventsScreen extends Screen {
     const list = await keepTrying(() => this.server.cameras(), failed, this.closed);
     if (!list) return;
     this.#overview.cameras = list.camera ?? [];
+    this.#stage.setCameras(this.#overview.cameras);
     this.#error = "";
     // A host without a catalogue has no groups.
     void this.#recordings.groups().then(
@@ -157,27 +183,31 @@ export class EventsScreen extends Screen {
 
   /** Opens what the address names, unless it is being shown. */
   async #openRoute(): Promise<void> {
-    const wanted = openFootage();
-    // Back from what is being played ends it.
-    if (!wanted) return this.#playback.close();
-    if (isSameFootage(wanted, this.#playback.lead?.player.footage)) return;
-    const opening = (this.#opening = `${wanted.kind}${wanted.id}`);
+    const place = parsePlace(location.hash);
+    if (!place) return;
+    const followed = (this.#followed += 1);
+    this.#isFollowing = true;
     try {
-      const footage = await this.#recordings.find(wanted);
-      if (this.#opening !== opening) return;
-      // An address that names a time leads to the picture of it.
-      if (footage && wanted.atMs !== null) this.#open(footage, false, wanted.atMs);
-      else if (footage) this.#open(footage);
-      else notify("This recording no longer exists, or you do not have permission to view it.");
+      await this.#openPlace(place, () => followed === this.#followed);
     } catch (error) {
-      notify(error instanceof ServerError ? error.message : String(error));
+      notify(asServerError(error).message);
+    } finally {
+      if (followed === this.#followed) this.#isFollowing = false;
     }
   }
 
-  #open(footage: Footage, isPlaying = true, atMs = footage.start * 1000): void {
-    this.#overview.reveal(footage, atMs);
-    this.#stage.include(footage.camera);
-    this.#playback.open(footage, atMs, isPlaying);
+  async #openPlace({ footage: wanted, atMs, stage, filter }: EventsPlace, isWanted: () => boolean): Promise<void> {
+    if (filter) this.#overview.filter.follow(filter);
+    if (stage) this.#stage.show(stage.plan, stage.large);
+    // Back from what is being played ends it.
+    if (!wanted && atMs === null) return this.#playback.close();
+    if (!wanted) return this.#jumps.to(atMs!, false);
+    if (atMs === null && isSameFootage(wanted, this.#playback.lead?.player.footage)) return;
+    const footage = await this.#recordings.find(wanted);
+    if (!isWanted()) return;
+    // An address that names a time leads to the picture of it.
+    if (footage) this.#jumps.show(footage, atMs === null, atMs ?? footage.start * 1000);
+    else notify("This recording no longer exists, or you do not have permission to view it.");
   }
 
   #seek(atMs: number, camera: number): void {
@@ -187,7 +217,8 @@ export class EventsScreen extends Screen {
 
   #showLanes(): void {
     const [first] = this.#overview.filter.cameras;
-    if (this.#stage.cameras.length === 0 && first) return this.#stage.show([first.id]);
+    if (this.#stage.cameras.length === 0 && first) return this.#stage.include(first.id);
+    this.#picker.show(this.#stage.plan.layout);
     this.#overview.showLanes(this.#stage.cameras);
   }
 
@@ -197,15 +228,25 @@ export class EventsScreen extends Screen {
     this.#transport.refresh();
     this.#overview.showPlayback(footage, this.#playback.playheadMs, this.#playback.isPlaying);
     this.#walk.refresh();
-    if (!footage) return;
-    this.#opening = "";
     this.#recordShown();
   }
 
-  /** Where a picture stands still, the address leads to this one. */
-  #recordShown(): void {
-    const footage = this.#playback.lead?.player.footage;
-    if (footage) recordFootage(footage, this.#playback.isPlaying ? null : this.#playback.playheadMs);
+  /** Back shall lead to the very picture that is left. */
+  #leaveMoment(): void {
+    this.#recordShown(true);
+    this.#isNewEntry = true;
+  }
+
+  /** The address leads to what is shown, to the frame where a picture stands still. */
+  #recordShown(isAtOnce = false): void {
+    const { playheadMs, lead, isPlaying, isScrubbed } = this.#playback;
+    if (playheadMs === null || isScrubbed || this.#isFollowing) return;
+    const { plan, large } = this.#stage;
+    const { choice, cameras } = this.#overview.filter;
+    const filter = { ...choice, cameras: cameras.map(({ id }) => id) };
+    const place = { footage: lead?.player.footage ?? null, atMs: playheadMs, stage: { plan, large }, filter };
+    recordPlace(place, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
+    this.#isNewEntry = false;
   }
 
   #refresh(): void {
@@ -235,21 +276,18 @@ export class EventsScreen extends Screen {
     return { cameras, kinds, atS: Math.floor((this.#playback.playheadMs ?? Date.now()) / 1000) };
   }
 
-  async #skip(by: Direction): Promise<void> {
-    try {
-      const next = await this.#walk.find(by);
-      if (!next) return notify(`There is no ${by > 0 ? "later" : "earlier"} event of these cameras and kinds.`);
-      notify(eventText(next, (camera) => this.#overview.nameOf(camera)));
-      this.#open(next, this.#playback.isPlaying);
-    } catch (error) {
-      notify(error instanceof ServerError ? error.message : String(error));
-    }
-  }
-
   /** What nobody sees is not played. */
   #onVisibility(): void {
     if (document.hidden) this.#playback.pause();
     else this.#overview.reload();
+  }
+
+  /** To the live picture of the camera on the stage, or to the wall. */
+  #goLive(): void {
+    const [camera, another] = this.#stage.cameras;
+    this.#leaveMoment();
+    if (camera !== undefined && another === undefined) showCamera(camera);
+    else location.hash = "#";
   }
 
   #changeRate(by: Direction): void {

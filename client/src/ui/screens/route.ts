@@ -1,24 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
-// there #event=7, #alert=8 or #pos=9, with &at=1764183438123 at the picture of that Unix time in milliseconds; #maps,
-// and there #map=2, its editor, #map=2&edit, and of that map a camera, #map=2&camera=5 or, of the recording server 3,
-// #map=2&camera=5@3; #settings, and there a section, #settings=cameras, with a record of it, #settings=cameras&open=5, or
-// a new one, &open=new. Before there is an account, #setup= and a one-time token.
+// what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera, #map=2&camera=5
+// or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras, with a record of
+// it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a one-time token.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.
 
-import type { FootageRef } from "../../wire/footage";
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
 export const kSettingsSections = ["cameras", "groups", "maps", "devices", "accounts", "storage", "audit"] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 
-const kPattern = /^#(camera|event|alert|pos)=(\d+)(?:&at=(\d+))?$/;
-/** Browsers refuse to change the address more often than a few times a second. */
-const kRecordIntervalMs = 500;
+const kCameraPattern = /^#camera=(\d+)$/;
+const kEventsPattern = /^#(events|(event|alert|pos)=\d+)(&|$)/;
 const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?|(&edit))?$/;
 
@@ -78,29 +75,16 @@ function hasOpener(): boolean {
   return (history.state as EntryState | null)?.hasOpener ?? false;
 }
 
-function opened(): { what: string; id: number; atMs: number | null } | null {
-  const found = kPattern.exec(location.hash);
-  return found ? { what: found[1]!, id: Number(found[2]), atMs: found[3] ? Number(found[3]) : null } : null;
-}
-
 export function openScreen(): ScreenName {
   if (location.hash === "#maps" || kMapPattern.test(location.hash)) return "maps";
   if (kSettingsPattern.test(location.hash)) return "settings";
-  const what = opened()?.what;
-  return location.hash === "#events" || (what !== undefined && what !== "camera") ? "events" : "wall";
+  return kEventsPattern.test(location.hash) ? "events" : "wall";
 }
 
 /** The id of the open camera; null means the wall. */
 export function openCamera(): number | null {
-  const open = opened();
-  return open?.what === "camera" ? open.id : null;
-}
-
-/** What is open on the events' screen; `atMs` is null where no picture of it is named. */
-export function openFootage(): (FootageRef & { atMs: number | null }) | null {
-  const open = opened();
-  if (!open || open.what === "camera") return null;
-  return { kind: open.what as FootageRef["kind"], id: open.id, atMs: open.atMs };
+  const found = kCameraPattern.exec(location.hash);
+  return found ? Number(found[1]) : null;
 }
 
 /** Opens a camera. Going from one camera to the next leaves one entry in the history, not one for each. */
@@ -119,18 +103,11 @@ export function showWall(): void {
 
 let recordedAtMs = 0;
 
-/**
- * Writes into the address what is being played, and the time of the picture where one stands still (else null); as with
- * cameras, all of it is one entry in the history. Call it again until the address has it.
- */
-export function recordFootage({ kind, id }: FootageRef, atMs: number | null): void {
-  // Not rounded down, which would lead to the frame before.
-  const hash = `#${kind}=${id}${atMs === null ? "" : `&at=${Math.ceil(atMs)}`}`;
-  const open = openFootage();
-  const isSame = open?.kind === kind && open.id === id;
-  if (location.hash === hash || (isSame && performance.now() - recordedAtMs < kRecordIntervalMs)) return;
+/** Writes into the address what is shown already. In place of the entry before it does so once in the interval. */
+export function recordAddress(hash: string, isNewEntry: boolean, intervalMs: number): void {
+  if (location.hash === hash || (!isNewEntry && performance.now() - recordedAtMs < intervalMs)) return;
   recordedAtMs = performance.now();
-  if (open === null) push(hash, false);
+  if (isNewEntry) push(hash, false);
   else replace(hash, false);
   shown = currentEntry();
 }

@@ -12,28 +12,29 @@ import { OncePerFrame } from "../widgets/once_per_frame";
 import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 import { SpanHandles, type Span } from "./span_handles";
+import { TimelineScrubber, type ScrubActions } from "./timeline_scrubber";
 import { TimeScale } from "./time_scale";
 import { coloursOf, kAxisPx, paintAxis, paintGrid, paintLane, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
-import { TimelineHint } from "./timeline_hint";
+import { kHintStillPx, TimelineHint } from "./timeline_hint";
 
 export interface Lane {
   camera: number;
   name: string;
 }
 
-export interface TimelineActions {
+export interface TimelineActions extends ScrubActions {
   /** A click: this time, on this camera. */
   seek(atMs: number, camera: number): void;
   /** A click on a mark. */
   open(footage: Footage): void;
-  /** The playhead is dragged. */
-  scrub(atMs: number): void;
   /** A click on a camera's name. */
   toggle(camera: number): void;
   /** Another span is shown. */
   moved(): void;
   /** A handle of the chosen span was moved. */
   choose(span: Span): void;
+  /** The address of the picture that a recording has of a time. */
+  stillAddress(footage: Footage, atMs: number, widthPx: number): string;
 }
 
 /** Wider than this, single events are neither fetched nor drawn, but the days that have any. */
@@ -61,11 +62,12 @@ export class Timeline {
     "aria-valuemax": String(2 ** 32),
     "aria-valuenow": "0",
     "aria-valuetext": "nothing plays",
-    "aria-label": "Timeline: plus and minus zoom, page keys move, End goes to now",
+    "aria-label": "Timeline: arrow keys move the playhead, plus and minus zoom, page keys move, End goes to now",
   });
   readonly #names = element("div", { class: "timeline-names" });
   readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
-  readonly #hint = new TimelineHint(this.#drawn);
+  readonly #hint: TimelineHint;
+  readonly #scrubber: TimelineScrubber;
   readonly #handles = new SpanHandles(this.#drawn, (span) => this.#actions.choose(span));
   readonly #pointers: PanZoomPointers;
   readonly #resized = new ResizeObserver(() => this.#resize());
@@ -76,7 +78,6 @@ export class Timeline {
   #kinds: ReadonlySet<EventKind> = new Set();
   #playheadMs: number | null = null;
   #selected: FootageRef | null = null;
-  #isScrubbing = false;
 
   constructor(cache: FootageCache, days: RecordedDays, actions: TimelineActions) {
     this.#cache = cache;
@@ -85,7 +86,14 @@ export class Timeline {
     const scrolled = element("div", { class: "timeline-scroll" }, this.#names, this.#drawn);
     const head = element("div", { class: "timeline-head" }, element("div", { class: "timeline-corner" }), this.#axis);
     this.root = element("section", { class: "timeline", "aria-label": "Timeline" }, head, scrolled);
+    this.#hint = new TimelineHint(this.#drawn, this.root);
     this.#resized.observe(this.#drawn);
+    const scrub = (atMs: number) => {
+      this.#hint.hide();
+      actions.scrub(atMs);
+    };
+    const scrubbing = { scrub, release: actions.release };
+    this.#scrubber = new TimelineScrubber(this.#axis, this.#canvas, () => this.#scale, () => this.#playheadMs, scrubbing);
     const panZoom: PanZoomActions = {
       pan: (px) => this.#show(this.#scale.panned(px)),
       zoom: (factor, { x }) => this.zoom(1 / factor, x),
@@ -93,7 +101,6 @@ export class Timeline {
     panZoomByWheel(this.#axis, panZoom);
     panZoomByWheel(this.#canvas, panZoom);
     this.#pointers = new PanZoomPointers(this.#canvas, panZoom, "x");
-    this.#listenToScrubbing();
     this.#canvas.addEventListener("click", (event) => this.#click(event));
     this.#canvas.addEventListener("pointerdown", () => this.#hint.hide());
     this.#canvas.addEventListener("pointermove", (event) => this.#pointers.isPressed || this.#showHint(event));
@@ -135,7 +142,7 @@ export class Timeline {
     this.#playheadMs = atMs;
     if (atMs === null) return this.redraw();
     const isLeaving = was !== null && this.#scale.contains(was) && !this.#scale.contains(atMs);
-    if (isPlaying && isLeaving && !this.#pointers.isPressed && !this.#isScrubbing) this.reveal(atMs);
+    if (isPlaying && isLeaving && !this.#pointers.isPressed && !this.#scrubber.isScrubbing) this.reveal(atMs);
     this.#canvas.setAttribute("aria-valuenow", String(Math.round(atMs / 1000)));
     this.#canvas.setAttribute("aria-valuetext", `${shortDate(atMs)} ${clockTime(atMs)}`);
     this.redraw();
@@ -234,21 +241,9 @@ export class Timeline {
     return { segments, footage: footage.filter((one) => this.#kinds.has(kindOf(one))) };
   }
 
-  #listenToScrubbing(): void {
-    const scrub = (event: PointerEvent) => this.#isScrubbing && this.#actions.scrub(this.#scale.msAt(event.offsetX));
-    this.#axis.addEventListener("pointerdown", (event) => {
-      if (event.button !== 0) return;
-      this.#axis.setPointerCapture(event.pointerId);
-      this.#isScrubbing = true;
-      scrub(event);
-    });
-    this.#axis.addEventListener("pointermove", scrub);
-    this.#axis.addEventListener("lostpointercapture", () => (this.#isScrubbing = false));
-  }
-
   #click(event: MouseEvent): void {
     const camera = this.#laneAt(event.offsetY);
-    if (camera === undefined || this.#pointers.hasMoved) return;
+    if (camera === undefined || this.#pointers.hasMoved || this.#scrubber.hasMoved) return;
     const { mark } = this.#footageAt(camera, event.offsetX);
     if (mark) this.#actions.open(mark);
     else this.#actions.seek(this.#scale.msAt(event.offsetX), camera);
@@ -273,7 +268,8 @@ export class Timeline {
     const atMs = this.#scale.msAt(x);
     const { event, mark } = this.#footageAt(camera, x);
     const about = mark ? describe(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";
-    this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`);
+    const still = event?.isSaved ? this.#actions.stillAddress(event, atMs, kHintStillPx) : "";
+    this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`, still);
   }
 
   #pressKey(event: KeyboardEvent): void {

@@ -6,6 +6,7 @@
 //               (2) Never more tiles stream than the connection to the server carries.
 
 import { chooseStreams, streamLimit } from "../../live/stream_budget";
+import { protocol } from "../../wire/protocol";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { element } from "../widgets/dom";
@@ -193,12 +194,6 @@ export class Grid {
     keepOrder(this.#inOrder().map(({ camera }) => camera.id));
     this.#assignSoon();
   }
-}
-
-/** The protocol over which the page was loaded; undefined for a page from the browser's cache. */
-function protocol(): string | undefined {
-  const loaded = [...performance.getEntriesByType("navigation"), ...performance.getEntriesByType("resource")];
-  return (loaded as PerformanceResourceTiming[]).find(({ nextHopProtocol }) => nextHopProtocol !== "")?.nextHopProtocol;
 }
 
 function same(one: Camera, other: Camera): boolean {

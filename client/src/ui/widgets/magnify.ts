@@ -7,8 +7,11 @@ import { panZoomByWheel, PanZoomPointers, type PanZoomActions, type Point } from
 const kMaxScale = 8;
 const kDoubleClickScale = 2.5;
 
-/** `picture` fills `frame`, which hides what lies beyond it. A double click magnifies, and another shows the whole again. */
-export function magnify(frame: HTMLElement, picture: HTMLElement): void {
+/**
+ * `picture` fills `frame`, which hides what lies beyond it. A double click magnifies, and another shows the whole again, unless
+ * `isTaken` returns true: then it was for something else.
+ */
+export function magnify(frame: HTMLElement, picture: HTMLElement, isTaken: () => boolean = () => false): void {
   let scale = 1;
   let offset: Point = { x: 0, y: 0 };
   const show = (x: number, y: number) => {
@@ -29,7 +32,7 @@ export function magnify(frame: HTMLElement, picture: HTMLElement): void {
   panZoomByWheel(frame, actions);
   new PanZoomPointers(frame, actions, "both");
   frame.addEventListener("dblclick", (event) => {
-    if ((event.target as Element).closest("button, a")) return;
+    if ((event.target as Element).closest("button, a") || isTaken()) return;
     const { left, top } = frame.getBoundingClientRect();
     actions.zoom(scale > 1 ? 1 / scale : kDoubleClickScale, { x: event.clientX - left, y: event.clientY - top });
   });

@@ -1,0 +1,70 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What is open on the events' screen, as a part of the address: #events, or #event=7, #alert=8 or #pos=9, and behind it
+//
+//   &at=1764183438123            the picture of that Unix time in milliseconds
+//   &layout=2&cameras=1,0,4      how many cells a row has, and their cameras in order, 0 for an empty one; &large=4 alone
+//   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all; &kept=1 only those kept
+//
+// What an address does not say stays as it is.
+
+import { kEventKinds } from "../../playback/coverage";
+import type { EventKind, FootageRef } from "../../wire/footage";
+import type { FilterChoice } from "../events/event_filter";
+import { kStageLayouts, type StagePlan } from "../events/stage_layout";
+import { recordAddress } from "./route";
+
+export interface EventsPlace {
+  /** Null where nothing was recorded, or nothing plays. */
+  footage: FootageRef | null;
+  atMs: number | null;
+  stage: { plan: StagePlan; large: number | null } | null;
+  filter: FilterChoice | null;
+}
+
+const kKinds = ["event", "alert", "pos"] as const;
+const kIds = /^\d+(,\d+)*$/;
+
+/** Null for an address of another screen. */
+export function parsePlace(hash: string): EventsPlace | null {
+  const said = new URLSearchParams(hash.replace(/^#/, ""));
+  const number = (name: string) => (/^\d{1,15}$/.test(said.get(name) ?? "") ? Number(said.get(name)) : null);
+  const ids = (name: string) => (kIds.test(said.get(name) ?? "") ? said.get(name)!.split(",").map(Number) : null);
+  const kind = kKinds.find((name) => number(name) !== null);
+  if (!kind && !/^#events(&|$)/.test(hash)) return null;
+  const layout = kStageLayouts.find((side) => side === number("layout"));
+  const cells = ids("cameras")?.map((camera) => camera || null);
+  const listed = ids("filter");
+  const kinds = said.get("kinds")?.split(",") ?? kEventKinds;
+  return {
+    footage: kind ? { kind, id: number(kind)! } : null,
+    atMs: number("at"),
+    stage: layout && cells ? { plan: { layout, cells }, large: number("large") } : null,
+    filter: listed && { cameras: listed, kinds: kEventKinds.filter((one) => kinds.includes(one)), isKeptOnly: said.has("kept") },
+  };
+}
+
+export function formatPlace({ footage, atMs, stage, filter }: EventsPlace): string {
+  const parts = [footage ? `#${footage.kind}=${footage.id}` : "#events"];
+  // Not rounded down, which would lead to the frame before.
+  if (atMs !== null) parts.push(`at=${Math.ceil(atMs)}`);
+  if (stage) parts.push(`layout=${stage.plan.layout}`, `cameras=${stage.plan.cells.map((camera) => camera ?? 0).join()}`);
+  if (stage && stage.large !== null) parts.push(`large=${stage.large}`);
+  if (filter && filter.cameras.length > 0) parts.push(`filter=${filter.cameras.join()}`, ...moreOf(filter));
+  return parts.join("&");
+}
+
+function moreOf({ kinds, isKeptOnly }: FilterChoice): string[] {
+  const isAll = kEventKinds.every((kind: EventKind) => kinds.includes(kind));
+  return [...(isAll ? [] : [`kinds=${kinds.join()}`]), ...(isKeptOnly ? ["kept=1"] : [])];
+}
+
+/**
+ * Writes what is shown into the address: as an entry of its own in the history, to which Back leads, or in place of the one
+ * before, which it does once in the interval: call it again until the address has it.
+ */
+export function recordPlace(place: EventsPlace, isNewEntry: boolean, intervalMs: number): void {
+  const before = parsePlace(location.hash);
+  const isFirst = before !== null && before.footage === null && before.atMs === null;
+  recordAddress(formatPlace(place), isNewEntry || isFirst, intervalMs);
+}

@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+
+import { formatPlace, parsePlace, type EventsPlace } from "../../../../client/src/ui/screens/events_route";
+
+describe("an address of the events' screen", () => {
+  const all = ["continuous", "alarm", "alert", "pos"] as const;
+  const nothing: EventsPlace = { footage: null, atMs: null, stage: null, filter: null };
+
+  test.each<[string, EventsPlace]>([
+    ["#events", nothing],
+    ["#alert=8", { ...nothing, footage: { kind: "alert", id: 8 } }],
+    ["#events&at=1764183438123&layout=1&cameras=5", { ...nothing, atMs: 1764183438123, stage: { plan: { layout: 1, cells: [5] }, large: null } }],
+    [
+      "#event=7&at=1764183438123&layout=2&cameras=1,0,4,0&large=4&filter=1,4&kinds=alarm,pos&kept=1",
+      {
+        footage: { kind: "event", id: 7 },
+        atMs: 1764183438123,
+        stage: { plan: { layout: 2, cells: [1, null, 4, null] }, large: 4 },
+        filter: { cameras: [1, 4], kinds: ["alarm", "pos"], isKeptOnly: true },
+      },
+    ],
+    ["#pos=9&filter=3", { ...nothing, footage: { kind: "pos", id: 9 }, filter: { cameras: [3], kinds: [...all], isKeptOnly: false } }],
+  ])("%s", (hash, place) => {
+    expect(parsePlace(hash)).toEqual(place);
+    expect(formatPlace(place)).toBe(hash);
+  });
+
+  test.each(["", "#camera=5", "#eventsx", "#event=x", "#event=", "#maps"])("%j is none", (hash) => {
+    expect(parsePlace(hash)).toBeNull();
+  });
+
+  test.each([
+    ["#event=7&layout=5&cameras=1", null],
+    ["#event=7&layout=2&cameras=1,,2", null],
+    ["#event=7&layout=2&cameras=-1", null],
+    ["#event=7&layout=2", null],
+  ])("%s leaves the stage as it is", (hash, stage) => {
+    expect(parsePlace(hash)).toMatchObject({ footage: { id: 7 }, stage });
+  });
+
+  test("leads to the frame that is shown, not to the one before", () => {
+    expect(formatPlace({ ...nothing, atMs: 1000.2 })).toBe("#events&at=1001");
+  });
+});
