@@ -109,7 +109,9 @@ export class FakeArchive {
       }
       case "VEXO.Picture At":
         this.stills.push(query.get("event") ?? "");
-        return new Response(this.picture.slice(), { headers: { "Content-Type": "image/jpeg" } });
+        return new Response(this.picture.slice(), {
+          headers: { "Content-Type": "image/jpeg", "X-Capture-Time": (number("time_ms") / 1000).toFixed(3) },
+        });
       case "VEXO.Catalog Groups":
         return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
       case "VEXO.Playback SetRate": {

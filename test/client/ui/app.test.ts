@@ -101,7 +101,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.keyboard.press("Escape");
     await page.waitForSelector(".day.playing");
     expect(await page.isDisabled("[aria-label='Next month']"), "beyond today").toBe(true);
-    await page.waitForURL(/#event=2&at=\d+$/);
+    await page.waitForURL(/#event=2&at=\d+&/);
     const frame = await settledFrame(page);
     await page.reload();
     await page.locator(".transport-frame", { hasText: frame }).waitFor();

@@ -33,6 +33,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
 
   const state = (page: Page, wanted: string) => page.waitForSelector(`.stage-picture[data-state=${wanted}]`);
 
+  const captions = (page: Page) => page.locator(".stage-time").allTextContents();
+
   /** Clicks where the timeline, whose width a day fills, shows that time of the camera. */
   async function clickLane(page: Page, camera: number, atS: number): Promise<void> {
     const { x, y, width, height } = (await page.locator(".timeline-lanes").boundingBox())!;
@@ -48,7 +50,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await clickLane(page, 2, noon + 1700);
     await state(page, "playing");
     const [, id, frame] = /^event(\d+) frame (\d+) /.exec(archive.asked[0]!)!;
-    expect(new URL(page.url()).hash).toBe(`#event=${id}`);
+    expect(new URL(page.url()).hash).toMatch(new RegExp(`^#event=${id}&at=`));
     // A pixel of this day is more than a minute.
     expect(Math.abs((Number(id) - 40) * 300 + Number(frame) / 10 - 1700)).toBeLessThan(90);
     await page.evaluate(() => (document.activeElement as HTMLElement).blur());
@@ -102,17 +104,17 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await state(page, "playing");
     const second = page.locator(".lane-name").nth(1);
     const paused = page.locator(".stage-picture.has-picture[data-state=paused]");
-    const captions = async () => new Set(await page.locator(".stage-time").allTextContents()).size;
+    const moments = async () => new Set(await captions(page)).size;
     await second.click();
     await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
     await page.click("button[aria-label=Pause]");
     await paused.nth(1).waitFor();
-    await vi.waitFor(async () => expect(await captions()).toBe(1));
+    await vi.waitFor(async () => expect(await moments()).toBe(1));
     await second.click();
     await expect(page.locator(".stage-picture").count()).resolves.toBe(1);
     await second.click();
     await paused.nth(1).waitFor();
-    expect([await captions(), archive.streams.length]).toEqual([1, 0]);
+    expect([await moments(), archive.streams.length]).toEqual([1, 0]);
     await page.click("button[aria-label=Play]");
     await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
     archive.streams[0]!.preempt();
@@ -127,16 +129,16 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     archive.stills.length = 0;
     const page = await opened("#event=6", 1440, 900);
     await page.locator(".notice", { hasText: "Skipped 1 h 59 min without recordings." }).waitFor({ timeout: 10_000 });
-    await page.waitForURL(/#event=7$/);
+    await page.waitForURL(/#event=7&/);
     for (const kind of ["Continuous", "POS"]) await page.locator(".chips label", { hasText: kind }).click();
     await page.evaluate(() => (document.activeElement as HTMLElement).blur());
     const before = page.locator('[aria-label^="Previous event: "][aria-label$=" · Parking"]');
     await before.click();
-    await page.waitForURL(/#event=5$/);
+    await page.waitForURL(/#event=5&/);
     const day = new Date(start * 1000).toLocaleDateString("en-GB", { day: "numeric", month: "short" });
     await page.locator(".notice", { hasText: new RegExp(`^${day} ..:.. · Parking$`) }).waitFor();
     await page.keyboard.press("ArrowDown");
-    await page.waitForURL(/#event=40$/);
+    await page.waitForURL(/#event=40&/);
     await page.locator(".row-still.loaded").first().waitFor();
     expect(new Set(archive.stills).size).toBeLessThan(40);
     await page.evaluate(() => localStorage.clear());
@@ -219,6 +221,125 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(span).toEqual(["1,2", noon + 3300, noon + 3540]);
     await page.keyboard.press("Escape");
     await end.waitFor({ state: "hidden" });
+  }, 40_000);
+
+  const hash = (page: Page) => new URL(page.url()).hash;
+  const noFocus = (page: Page) => page.evaluate(() => (document.activeElement as HTMLElement).blur());
+
+  test("cameras are added in empty cells, play in step, one large and back; a closed one ends its player", async () => {
+    client.server.cameras.push({ id: 3, name: "Gate", video_type: 1 });
+    const page = await opened(`#event=14&at=${(noon + 1260) * 1000}`, 1440, 900, 9);
+    await state(page, "paused");
+    expect(await page.isDisabled("button[aria-label^='Three by three']"), "six connections over HTTP/1.1").toBe(true);
+    await page.keyboard.press("2");
+    for (const name of ["Parking", "Gate"]) await page.locator(".stage-cell select").first().selectOption({ label: name });
+    await page.locator(".message-sentence", { hasText: "No recording at 12:21:00." }).waitFor();
+    await noFocus(page);
+    await page.keyboard.press(" ");
+    await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
+    for (const rate of ["]", "]", "["]) {
+      await page.keyboard.press(rate);
+      await page.waitForTimeout(600);
+      const [one, other] = (await captions(page)).map((text) => Date.parse(`1 Jan 2000 ${text.split(" ").at(-1)}`));
+      // Frames are 100 ms apart, and the rate leaves at most three of four out.
+      expect(Math.abs(one! - other!)).toBeLessThanOrEqual(400);
+    }
+    await page.keyboard.press("Enter");
+    await expect(page.locator(".stage > :visible").count()).resolves.toBe(1);
+    await page.keyboard.press("Escape");
+    await page.locator(".stage-picture").nth(1).dblclick();
+    expect(await page.locator(".stage-picture.is-large canvas").getAttribute("aria-label")).toBe("Recording of Parking");
+    await page.locator(".stage-picture.is-large").dblclick();
+    await expect(page.locator(".stage > :visible").count()).resolves.toBe(4);
+    expect(archive.streams.length).toBe(2);
+    await page.locator(".stage-picture").nth(1).hover();
+    await page.click("button[aria-label='Close Parking']");
+    await vi.waitFor(() => expect(archive.streams.length).toBe(1), { timeout: 500 });
+    client.server.cameras.pop();
+  }, 40_000);
+
+  test.each(["mouse", "keys"] as const)("the playhead that is dragged with %s shows stills, and plays where it is let go", async (how) => {
+    const page = await opened("#event=14", 1440, 900);
+    await state(page, "playing");
+    archive.stills.length = 0;
+    const before = (await captions(page))[0]!;
+    const { x, y, width } = (await page.locator(".timeline-axis").boundingBox())!;
+    if (how === "mouse") {
+      // The recording is an eighth of the width from the left, and there are forty minutes more.
+      await page.mouse.move(x + width * 0.13, y + 10);
+      await page.mouse.down();
+      for (let px = 0; px < 60; px += 3) await page.mouse.move(x + width * 0.13 + px, y + 10);
+    } else {
+      await page.keyboard.press("Tab");
+      await page.focus(".timeline-lanes");
+      for (let press = 0; press < 15; press += 1) await page.keyboard.down("ArrowRight");
+    }
+    await vi.waitFor(() => expect(archive.stills.length).toBeGreaterThan(2));
+    expect(archive.streams, "nothing plays meanwhile").toEqual([]);
+    await vi.waitFor(async () => expect((await captions(page))[0]).not.toBe(before));
+    archive.asked.length = 0;
+    const shown = await page.locator(".timeline-lanes").getAttribute("aria-valuenow");
+    await (how === "mouse" ? page.mouse.up() : page.keyboard.up("ArrowRight"));
+    await state(page, "playing");
+    const [, id, frame] = /^event(\d+) frame (\d+) /.exec(archive.asked.at(-1)!)!;
+    expect(Math.abs(noon + (Number(id) - 10) * 300 + Number(frame) / 10 - Number(shown))).toBeLessThan(1.5);
+  }, 40_000);
+
+  test("a picture of the time under the pointer; ten seconds back; live and back", async () => {
+    const page = await opened(`#event=14&at=${(noon + 1260) * 1000}`, 1440, 900);
+    await state(page, "paused");
+    const { x, y, width } = (await page.locator(".timeline-lanes").boundingBox())!;
+    await page.mouse.move(x + width * 0.13, y + 10);
+    await page.locator(".timeline-hint img.loaded").waitFor();
+    await page.keyboard.press("j");
+    await vi.waitFor(async () => expect((await captions(page))[0]).toMatch(/12:20:50\.0$/));
+    await page.waitForURL(new RegExp(`at=${(noon + 1250) * 1000}&`));
+    await page.click(".transport-live");
+    await page.waitForSelector(".large");
+    expect(hash(page)).toBe("#camera=1");
+    await page.keyboard.press("Escape");
+    await vi.waitFor(async () => expect((await captions(page))[0]).toMatch(/12:20:50\.0$/));
+  }, 40_000);
+
+  test("a link holds cameras, layout, time and filter; Back, Forward and reload lead to the same pictures", async () => {
+    const link = `#event=14&at=${(noon + 1260) * 1000}&layout=2&cameras=1,0,2,0&filter=1,2&kinds=alarm,pos`;
+    const page = await opened(link, 1440, 900, 9);
+    const paused = page.locator(".stage-picture.has-picture[data-state=paused]");
+    const seen = async () => [hash(page), await captions(page), await page.locator(".stage > *").evaluateAll((all) => all.map(({ className }) => className.includes("picture")))];
+    await paused.nth(1).waitFor();
+    expect(await page.locator(".chips input").evaluateAll((all) => all.map((box) => (box as HTMLInputElement).checked))).toEqual([false, true, false, true, false]);
+    const first = await seen();
+    expect(first[0]).toBe(link);
+    await page.keyboard.press("t");
+    const day = new Date(noon * 1000).toLocaleDateString("sv");
+    await page.keyboard.type("25:00");
+    await page.keyboard.press("Enter");
+    await page.locator("dialog .form-message", { hasText: "Please type a time" }).waitFor();
+    await page.getByLabel("Time", { exact: true }).fill(`${day} 12:40:30`);
+    await page.keyboard.press("Enter");
+    await vi.waitFor(async () => expect(await captions(page)).toEqual([expect.stringContaining("12:40:30.0"), expect.stringContaining("12:40:30.0")]));
+    await page.waitForURL(/#event=18&at=/);
+    const second = await seen();
+    await page.goBack();
+    await vi.waitFor(async () => expect(await seen()).toEqual(first));
+    await page.goForward();
+    await vi.waitFor(async () => expect(await seen()).toEqual(second));
+    await page.reload();
+    await vi.waitFor(async () => expect(await seen()).toEqual(second), 10_000);
+    await page.evaluate(() => localStorage.clear());
+  }, 40_000);
+
+  test("the same moment on all cameras, from a card of the list and from the player", async () => {
+    const page = await opened("#pos=90", 1440, 900, 9);
+    await state(page, "playing");
+    await page.locator("[data-ref=pos90] .row-all").click({ force: true });
+    await page.locator(".stage[data-layout='2'] .stage-picture[data-state=playing]").nth(1).waitFor();
+    expect(hash(page)).toMatch(/^#pos=90&.*&cameras=2,1,0,0&/);
+    await page.locator("[data-ref=event40] .row-open, [data-ref=event10] .row-open").first().waitFor({ state: "attached" });
+    await page.keyboard.press("1");
+    await page.locator(".stage[data-layout='1']").waitFor();
+    await page.keyboard.press("a");
+    await page.locator(".stage[data-layout='2'] .stage-picture[data-state=playing]").nth(1).waitFor();
   }, 40_000);
 
   test("a phone, too, says that there is nothing only once it knows", async () => {
