@@ -1,12 +1,21 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab. And what the
-# server then still runs.
+# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine cameras of one
+# moment. And what the server then still runs.
+import base64
+import json
+import os
 import subprocess
+import time
 import unittest
 
-from installation import Installation, wait_until
+from installation import Installation, recorded_events, wait_until
+from painted import ClockReader
+from players import numbered, playing
 from visit import Visit
+
+# Between the painting of a picture and its arrival at the recorder, by whose time the players go.
+ARRIVAL_MS = 60
 
 
 class BrowserTest(unittest.TestCase):
@@ -27,6 +36,47 @@ class BrowserTest(unittest.TestCase):
 
             self.assertEqual(visit.see("seen again")["complaints"], [])
             self.assertGreater(len(self.server.requests()), len(self.idle), "nothing streams")
+
+    def recorded_camera(self, name, fps):
+        source = f"test:mjpeg?size=640x360&fps={fps}&label={name}"
+        recording = ["--enable", "--record", "always", "--segment", "10s"]
+        added = self.server.cli("camera", "add", "--name", name, "--source", source, *recording, "--json")
+        return json.loads(added)["id"]
+
+    def clock_reader(self, camera):
+        pictures, times = [], []
+        for event in recorded_events(self.server, camera)[:2]:
+            with playing(self.server, event["id"], interval=0) as parts:
+                pictures += [picture for _, picture in numbered(parts, event["frame_count"], times)]
+        return ClockReader(pictures, [float(each) for each in times], 640, 360)
+
+    def test_nine_cameras_of_one_moment_stay_in_step(self):
+        slow, fast = 5, 10
+        for camera in 1, 2, 4:  # of the demo: large, and not looked at here
+            self.server.cli("camera", "set", str(camera), "--disable")
+        cameras = [self.recorded_camera(f"Yard {at}", slow if at % 3 == 2 else fast) for at in range(9)]
+        began = wait_until(lambda: min((event["start"] for event in recorded_events(self.server, cameras[-1])), default=0), 30, "recording") + 1
+        wait_until(lambda: time.time() > began + 24, 40, "footage to go through")
+        reader = self.clock_reader(cameras[-1])
+        seconds = os.environ.get("LOOKHAVEN_STEP_SECONDS", "3")
+        steps = {"AT": str(began * 1000 + 500), "CAMERAS": ",".join(map(str, cameras)), "SECONDS": seconds, "TZ": "UTC"}
+        with Visit("in_step.mjs", self.secure, **steps) as visit:
+            for step, rate in ("opened", 1), ("at 1", 1), ("at 4", 4), ("at ½", 1), ("at 1", 1):
+                seen = visit.see(step)
+                for sample in seen["samples"]:
+                    times = reader.read([base64.b64decode(picture) for picture in sample])
+                    self.assertLessEqual(max(times) - min(times), rate * 1000 / slow + ARRIVAL_MS, (step, times))
+            dragged = visit.see("dragged")
+            self.assertGreater(dragged["pictures"], 4, "the picture follows the pointer")
+            self.assertEqual(dragged["players"], 0)
+            wait_until(lambda: len(self.server.requests() - self.idle) <= 3, 2, "nothing plays while it is dragged")
+            released = visit.see("let go")
+            times = reader.read([base64.b64decode(picture) for picture in released["samples"][0]])
+            self.assertLessEqual(max(times) - min(times), 1000 / slow + ARRIVAL_MS, times)
+            self.assertLess(abs(times[0] / 1000 - released["told"] % 3600), 4, "plays from where it was let go")
+            closed = visit.see("closed")
+            wait_until(lambda: len(self.server.requests() - self.idle) == 8, 2, "the closed one's player ends")
+            self.assertEqual(closed["violations"] + closed["complaints"], [])
 
     def test_a_visit_over_https_and_http(self):
         for address, protocol in (self.secure, "h2"), (f"http://127.0.0.1:{self.server.port}/", "http/1.1"):

@@ -144,7 +144,10 @@ export class SyncPlayback {
   }
 
   setRate(rate: number): void {
+    const before = this.rate;
     this.#tracks.setRate(rate);
+    // What is on its way to the players leaves out frames that a slower rate shows.
+    if (this.#isPlaying && before > 1 && rate < before) this.seek(this.#tracks.clock.atMs);
     this.#changed();
   }
 
@@ -189,7 +192,7 @@ export class SyncPlayback {
     }
     if (this.#isPlaying) {
       // A player slows down when it comes to the end of what is still being recorded.
-      if (state.kind === "playing" && rate !== this.rate) this.#tracks.setRate(rate);
+      if (state.kind === "playing" && rate !== this.rate) return this.setRate(rate);
       if (state.kind === "ended") void this.#goOn(track, true);
       if (/failed|preempted/.test(state.kind) && !this.#tracks.hasActive) this.#isPlaying = false;
     }
@@ -228,11 +231,13 @@ export class SyncPlayback {
   async #goOn(track: Track, mayStop: boolean): Promise<void> {
     const ended = track.player.footage;
     if (ended?.kind !== "event") return mayStop && track === this.#lead ? this.pause() : undefined;
+    this.#tracks.awaitNext(track);
     const next = await this.#lookup.following(ended);
     const isWanted = this.#isPlaying && this.tracks.includes(track) && track.player.footage === ended;
     if (!isWanted || track.player.state.kind !== "ended") return;
-    if (next) this.#tracks.start(track, next, next.start * 1000, true);
-    else if (!this.#tracks.hasActive) await this.#advance();
+    if (next) return this.#tracks.start(track, next, next.start * 1000, true);
+    this.#tracks.clock.leave(track);
+    if (!this.#tracks.hasActive) await this.#advance();
   }
 
   /** Plays what comes after the playhead; where nothing does, calls `otherwise`, or stops. */

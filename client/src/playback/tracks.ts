@@ -87,6 +87,11 @@ export class Tracks {
     return true;
   }
 
+  /** The clock stays at the end of the recording while it is looked up what follows. */
+  awaitNext(track: Track): void {
+    this.clock.join(track, track.player.positionMs, 0);
+  }
+
   pause(): void {
     this.clock.stop();
     for (const { player } of this.#all) player.pause();

@@ -34,6 +34,7 @@ export class Overview {
   readonly #search: TextSearch;
   readonly #actions: OverviewActions;
   #cameras: readonly Camera[] = [];
+  #onStage: readonly number[] = [];
   #settling: ReturnType<typeof setTimeout> | undefined;
 
   constructor(recordings: Recordings, actions: OverviewActions) {
@@ -68,10 +69,12 @@ export class Overview {
     return this.#cameras.find(({ id }) => id === camera)?.name ?? `Camera ${camera}`;
   }
 
-  /** Shows a lane for each camera that is chosen. */
+  /** Shows a lane for each camera that is chosen, or on the stage. */
   showLanes(onStage: readonly number[]): void {
+    this.#onStage = onStage;
     this.timeline.setKinds(this.filter.kinds);
-    this.timeline.setLanes(this.filter.cameras.map(({ id, name }) => ({ camera: id, name })), onStage);
+    const lanes = this.#cameras.filter(({ id }) => this.#loaded.includes(id));
+    this.timeline.setLanes(lanes.map(({ id, name }) => ({ camera: id, name })), onStage);
     this.#search.refresh();
     // On a phone the timeline may be out of sight, and then tells of no span that has to be loaded.
     this.reload();
@@ -93,8 +96,8 @@ export class Overview {
   reload(): void {
     if (document.hidden || this.#cameras.length === 0) return;
     const { startMs, endMs } = this.timeline.scale;
-    if (!this.timeline.showsEvents) this.#days.load(this.#chosen, startMs, endMs);
-    else void this.cache.load(this.#chosen, startMs / 1000, endMs / 1000, true);
+    if (!this.timeline.showsEvents) this.#days.load(this.#loaded, startMs, endMs);
+    else void this.cache.load(this.#loaded, startMs / 1000, endMs / 1000, true);
     // Asks again for days that the server did not answer for.
     this.calendar.refresh();
     this.#showFootage();
@@ -114,6 +117,10 @@ export class Overview {
 
   get #chosen(): number[] {
     return this.filter.cameras.map(({ id }) => id);
+  }
+
+  get #loaded(): number[] {
+    return [...new Set([...this.#chosen, ...this.#onStage])];
   }
 
   #pickDay(dayMs: number): void {

@@ -268,7 +268,15 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       // The recording is an eighth of the width from the left, and there are forty minutes more.
       await page.mouse.move(x + width * 0.13, y + 10);
       await page.mouse.down();
-      for (let px = 0; px < 60; px += 3) await page.mouse.move(x + width * 0.13 + px, y + 10);
+      await page.evaluate(() => {
+        const seen = ((globalThis as { seen?: number }).seen = 0);
+        const count = () => ((globalThis as { seen?: number }).seen = ((globalThis as { seen?: number }).seen ?? seen) + 1);
+        new MutationObserver(count).observe(document.querySelector(".stage-time")!, { childList: true, subtree: true });
+      });
+      const began = Date.now();
+      for (let step = 0; Date.now() - began < 1500; step += 1) await page.mouse.move(x + width * 0.13 + (step % 60), y + 10);
+      const seen = await page.evaluate(() => (globalThis as { seen?: number }).seen!);
+      expect(seen / ((Date.now() - began) / 1000), "pictures a second").toBeGreaterThanOrEqual(10);
     } else {
       await page.keyboard.press("Tab");
       await page.focus(".timeline-lanes");
