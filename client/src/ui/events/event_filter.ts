@@ -15,11 +15,16 @@ const kDefaultCameras = 8;
 const kMaxCameras = 32;
 const kStorageKey = "lookhaven.events";
 
-/** What is listed. */
+/** What is listed, as it is kept for the next visit. */
 export interface FilterChoice {
   cameras: readonly number[];
   kinds: readonly EventKind[];
   isKeptOnly: boolean;
+}
+
+/** All of what is listed: `words` are those that a text must have, none if empty. */
+export interface ListChoice extends FilterChoice {
+  words: string;
 }
 
 export class EventFilter {

@@ -10,7 +10,7 @@ import type { Camera } from "../../wire/server";
 import { spanText } from "../timeline/time_scale";
 import { Timeline, type TimelineActions } from "../timeline/timeline";
 import { Calendar } from "./calendar";
-import { EventFilter } from "./event_filter";
+import { EventFilter, type ListChoice } from "./event_filter";
 import { EventList } from "./event_list";
 import { listEvents, whyNoEvents } from "./event_listing";
 import { TextSearch } from "./text_search";
@@ -63,6 +63,17 @@ export class Overview {
 
   get cameras(): readonly Camera[] {
     return this.#cameras;
+  }
+
+  /** What is listed now: of the cameras that were chosen those that there are. */
+  get choice(): ListChoice {
+    return { ...this.filter.choice, cameras: this.#chosen, words: this.#search.words };
+  }
+
+  /** Lists what a link asks for. */
+  follow(choice: ListChoice): void {
+    this.#search.words = choice.words;
+    this.filter.follow(choice);
   }
 
   nameOf(camera: number): string {

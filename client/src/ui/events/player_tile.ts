@@ -33,6 +33,8 @@ export class PlayerTile {
   /** The still that is shown while the playhead is dragged: undefined while it is not, null where there is none. */
   #still: Still | null | undefined;
   #stills = 0;
+  /** The number of the still that was drawn last. */
+  #drawn = 0;
 
   constructor(name: string, player: Player, actions: PlayerTileActions) {
     this.player = player;
@@ -88,12 +90,16 @@ export class PlayerTile {
   /** Shows a still in place of what the player has, null for none then, until `showPlayer`. */
   async showStill(still: Still | null): Promise<void> {
     const number = (this.#stills += 1);
-    if (still) await this.#draw(still.jpeg, () => number === this.#stills).catch(() => undefined);
-    if (number === this.#stills) this.#still = still;
+    // One that takes longer to decode than the next to come is still newer than what is seen.
+    const isNewer = () => number > this.#drawn;
+    if (still) await this.#draw(still.jpeg, isNewer).catch(() => undefined);
+    if (!isNewer()) return;
+    this.#drawn = number;
+    this.#still = still;
   }
 
   showPlayer(): void {
-    this.#stills += 1;
+    this.#drawn = this.#stills;
     this.#still = undefined;
   }
 

@@ -50,7 +50,16 @@ export class TextSearch {
 
   /** Words are typed, so the list shows what they find. */
   get isActive(): boolean {
-    return this.#input.value.trim() !== "";
+    return this.words !== "";
+  }
+
+  get words(): string {
+    return this.#input.value.trim();
+  }
+
+  /** Call `refresh` to ask for them. */
+  set words(words: string) {
+    if (words !== this.words) this.#input.value = words;
   }
 
   /** Newest first. */
@@ -71,7 +80,7 @@ export class TextSearch {
   /** Asks where the words, the cameras or the kinds are others than those last asked for. */
   refresh(): void {
     clearTimeout(this.#typing);
-    const words = this.#input.value.trim();
+    const words = this.words;
     const { cameras, kinds } = this.#scope();
     const wanted = kEventKinds.filter((kind) => kind === "alert" || kind === "pos").filter((kind) => kinds.has(kind));
     const asked = words && JSON.stringify([words, cameras, wanted]);

@@ -4,13 +4,14 @@
 //
 //   &at=1764183438123            the picture of that Unix time in milliseconds
 //   &layout=2&cameras=1,0,4      how many cells a row has, and their cameras in order, 0 for an empty one; &large=4 alone
-//   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all; &kept=1 only those kept
+//   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all; &kept=1 only those kept,
+//                                &text=two+words those with these words in their text
 //
 // What an address does not say stays as it is.
 
 import { kEventKinds } from "../../playback/coverage";
 import type { EventKind, FootageRef } from "../../wire/footage";
-import type { FilterChoice } from "../events/event_filter";
+import type { ListChoice } from "../events/event_filter";
 import { kStageLayouts, type StagePlan } from "../events/stage_layout";
 import { recordAddress } from "./route";
 
@@ -19,7 +20,7 @@ export interface EventsPlace {
   footage: FootageRef | null;
   atMs: number | null;
   stage: { plan: StagePlan; large: number | null } | null;
-  filter: FilterChoice | null;
+  filter: ListChoice | null;
 }
 
 const kKinds = ["event", "alert", "pos"] as const;
@@ -40,7 +41,12 @@ export function parsePlace(hash: string): EventsPlace | null {
     footage: kind ? { kind, id: number(kind)! } : null,
     atMs: number("at"),
     stage: layout && cells ? { plan: { layout, cells }, large: number("large") } : null,
-    filter: listed && { cameras: listed, kinds: kEventKinds.filter((one) => kinds.includes(one)), isKeptOnly: said.has("kept") },
+    filter: listed && {
+      cameras: listed,
+      kinds: kEventKinds.filter((one) => kinds.includes(one)),
+      isKeptOnly: said.has("kept"),
+      words: said.get("text")?.trim() ?? "",
+    },
   };
 }
 
@@ -54,9 +60,10 @@ export function formatPlace({ footage, atMs, stage, filter }: EventsPlace): stri
   return parts.join("&");
 }
 
-function moreOf({ kinds, isKeptOnly }: FilterChoice): string[] {
+function moreOf({ kinds, isKeptOnly, words }: ListChoice): string[] {
   const isAll = kEventKinds.every((kind: EventKind) => kinds.includes(kind));
-  return [...(isAll ? [] : [`kinds=${kinds.join()}`]), ...(isKeptOnly ? ["kept=1"] : [])];
+  const text = new URLSearchParams({ text: words }).toString();
+  return [...(isAll ? [] : [`kinds=${kinds.join()}`]), ...(isKeptOnly ? ["kept=1"] : []), ...(words ? [text] : [])];
 }
 
 /**

@@ -197,7 +197,7 @@ export class EventsScreen extends Screen {
   }
 
   async #openPlace({ footage: wanted, atMs, stage, filter }: EventsPlace, isWanted: () => boolean): Promise<void> {
-    if (filter) this.#overview.filter.follow(filter);
+    if (filter) this.#overview.follow(filter);
     if (stage) this.#stage.show(stage.plan, stage.large);
     // Back from what is being played ends it.
     if (!wanted && atMs === null) return this.#playback.close();
@@ -242,9 +242,8 @@ export class EventsScreen extends Screen {
     const { playheadMs, lead, isPlaying, isScrubbed } = this.#playback;
     if (playheadMs === null || isScrubbed || this.#isFollowing) return;
     const { plan, large } = this.#stage;
-    const { choice, cameras } = this.#overview.filter;
-    const filter = { ...choice, cameras: cameras.map(({ id }) => id) };
-    const place = { footage: lead?.player.footage ?? null, atMs: playheadMs, stage: { plan, large }, filter };
+    const footage = lead?.player.footage ?? null;
+    const place = { footage, atMs: playheadMs, stage: { plan, large }, filter: this.#overview.choice };
     recordPlace(place, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
     this.#isNewEntry = false;
   }

@@ -16,10 +16,14 @@ describe("an address of the events' screen", () => {
         footage: { kind: "event", id: 7 },
         atMs: 1764183438123,
         stage: { plan: { layout: 2, cells: [1, null, 4, null] }, large: 4 },
-        filter: { cameras: [1, 4], kinds: ["alarm", "pos"], isKeptOnly: true },
+        filter: { cameras: [1, 4], kinds: ["alarm", "pos"], isKeptOnly: true, words: "" },
       },
     ],
-    ["#pos=9&filter=3", { ...nothing, footage: { kind: "pos", id: 9 }, filter: { cameras: [3], kinds: [...all], isKeptOnly: false } }],
+    ["#pos=9&filter=3", { ...nothing, footage: { kind: "pos", id: 9 }, filter: { cameras: [3], kinds: [...all], isKeptOnly: false, words: "" } }],
+    [
+      "#pos=9&filter=3&text=2+Tea+%26+%E2%82%AC+%2B5%25",
+      { ...nothing, footage: { kind: "pos", id: 9 }, filter: { cameras: [3], kinds: [...all], isKeptOnly: false, words: "2 Tea & € +5%" } },
+    ],
   ])("%s", (hash, place) => {
     expect(parsePlace(hash)).toEqual(place);
     expect(formatPlace(place)).toBe(hash);

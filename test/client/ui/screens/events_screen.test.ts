@@ -3,37 +3,12 @@
 // The events' screen in a real browser: from the calendar to the picture of a time, and with keys from there.
 
 import type { Page } from "playwright-core";
-import { hasBrowser, ServedClient, smallControls } from "../../support/served_client";
-
-const kFrames = 3_000;
+import { hasBrowser, smallControls } from "../../support/served_client";
+import { hashOf, noFocus, ServedEvents, state } from "../../support/served_events";
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
-  const client = new ServedClient();
-  const { archive } = client.server;
-  /** Two days ago at noon of the browser's zone: an hour of two cameras, in recordings of five minutes. */
-  const noon = Math.floor(new Date(Date.now() - 2 * 86_400_000).setHours(12, 0, 0, 0) / 1000);
-
-  beforeAll(() => {
-    archive.framesPerSecond = 10;
-    client.server.cameras.push({ id: 1, name: "Entrance <b>", video_type: 1 }, { id: 2, name: "Parking", video_type: 1 });
-    for (let piece = 0; piece < 12; piece += 1) {
-      const start = noon + piece * 300;
-      archive.recorded.push({ id: 10 + piece, camera: 1, start, stop: start + 300, frames: kFrames });
-      archive.recorded.push({ id: 40 + piece, camera: 2, start, stop: start + 300, frames: kFrames, reason: 3 });
-    }
-    archive.recorded.push({ id: 90, camera: 2, start: noon, stop: noon + 30, frames: 300, kind: "pos", text: "2 Tea <b>\nTotal 5" });
-  });
-
-  async function opened(hash: string, widthPx: number, heightPx: number, players = 1): Promise<Page> {
-    archive.playersPerSession = players;
-    archive.asked.length = 0;
-    client.server.hasSession = true;
-    return client.open(`${client.address}${hash}`, widthPx, heightPx);
-  }
-
-  const state = (page: Page, wanted: string) => page.waitForSelector(`.stage-picture[data-state=${wanted}]`);
-
-  const captions = (page: Page) => page.locator(".stage-time").allTextContents();
+  const events = new ServedEvents();
+  const { archive, noon } = events;
 
   /** Clicks where the timeline, whose width a day fills, shows that time of the camera. */
   async function clickLane(page: Page, camera: number, atS: number): Promise<void> {
@@ -42,7 +17,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   }
 
   test("calendar, timeline, picture of that time; pause, rate and the way back", async () => {
-    const page = await opened("#events", 1440, 900);
+    const page = await events.open("#events", 1440, 900);
     const day = new Date(noon * 1000).setHours(0, 0, 0, 0);
     await page.click(`.day.has[data-day="${day}"]`);
     expect(await page.locator(".day.has").count()).toBe(1);
@@ -50,10 +25,10 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await clickLane(page, 2, noon + 1700);
     await state(page, "playing");
     const [, id, frame] = /^event(\d+) frame (\d+) /.exec(archive.asked[0]!)!;
-    expect(new URL(page.url()).hash).toMatch(new RegExp(`^#event=${id}&at=`));
+    expect(hashOf(page)).toMatch(new RegExp(`^#event=${id}&at=`));
     // A pixel of this day is more than a minute.
     expect(Math.abs((Number(id) - 40) * 300 + Number(frame) / 10 - 1700)).toBeLessThan(90);
-    await page.evaluate(() => (document.activeElement as HTMLElement).blur());
+    await noFocus(page);
     await page.keyboard.press(" ");
     await state(page, "paused");
     await vi.waitFor(() => expect(archive.streams).toEqual([]));
@@ -62,11 +37,11 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await vi.waitFor(() => expect(archive.asked.at(-1)).toMatch(/ at 2$/));
     await page.goBack();
     await state(page, "empty");
-    expect(new URL(page.url()).hash).toBe("#events");
+    expect(hashOf(page)).toBe("#events");
   }, 40_000);
 
   test("an address opens its recording; the file is offered; a mark's text is text", async () => {
-    const page = await opened("#pos=90", 1440, 900);
+    const page = await events.open("#pos=90", 1440, 900);
     await state(page, "playing");
     expect(archive.asked[0]).toBe("pos90 frame 0 to -1 at 1");
     const link = await page.getAttribute("a[aria-label^=Download]", "href");
@@ -79,7 +54,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   test("words find what an alert or a receipt says, at any time, marked; a click plays it", async () => {
     const start = noon - 90 * 86_400;
     archive.recorded.push({ id: 91, camera: 1, start, stop: start + 30, frames: 300, kind: "alert", text: "Van at gate <i>\n2 Tea" });
-    const page = await opened("#events", 1440, 900);
+    const page = await events.open("#events", 1440, 900);
     const field = page.getByRole("searchbox");
     const texts = () => page.locator(".row-text").allTextContents();
     await field.fill("Tea");
@@ -88,7 +63,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(await page.locator(".row-text mark").allTextContents()).toEqual(["Tea", "Tea"]);
     await page.locator(".chips label", { hasText: "POS" }).click();
     await page.locator(".list-head", { hasText: "1 found" }).waitFor();
-    await page.locator("[data-ref=alert91] button").click();
+    await page.locator("[data-ref=alert91] .row-open").click();
     await state(page, "playing");
     expect(archive.asked.at(-1)).toBe("alert91 frame 0 to -1 at 1");
     await field.fill("Milk");
@@ -99,39 +74,17 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     archive.recorded.pop();
   }, 40_000);
 
-  test("a pause shows one moment of all cameras, of those too that join then; one that is preempted says so", async () => {
-    const page = await opened("#event=14", 1440, 900, 4);
-    await state(page, "playing");
-    const second = page.locator(".lane-name").nth(1);
-    const paused = page.locator(".stage-picture.has-picture[data-state=paused]");
-    const moments = async () => new Set(await captions(page)).size;
-    await second.click();
-    await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
-    await page.click("button[aria-label=Pause]");
-    await paused.nth(1).waitFor();
-    await vi.waitFor(async () => expect(await moments()).toBe(1));
-    await second.click();
-    await expect(page.locator(".stage-picture").count()).resolves.toBe(1);
-    await second.click();
-    await paused.nth(1).waitFor();
-    expect([await moments(), archive.streams.length]).toEqual([1, 0]);
-    await page.click("button[aria-label=Play]");
-    await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
-    archive.streams[0]!.preempt();
-    await page.waitForSelector(".stage-picture[data-state=preempted] .button", { state: "attached" });
-  }, 40_000);
-
   test("the walk keeps to the filter and to no day, and says what comes next; a gap is told; cards load few stills", async () => {
     const start = noon - 20 * 86_400;
     archive.recorded.push({ id: 5, camera: 2, start, stop: start + 1, frames: 10, reason: 3 });
     archive.recorded.push({ id: 6, camera: 1, start: start + 60, stop: start + 61, frames: 10 });
     archive.recorded.push({ id: 7, camera: 1, start: start + 7_260, stop: start + 7_261, frames: 10 });
     archive.stills.length = 0;
-    const page = await opened("#event=6", 1440, 900);
+    const page = await events.open("#event=6", 1440, 900);
     await page.locator(".notice", { hasText: "Skipped 1 h 59 min without recordings." }).waitFor({ timeout: 10_000 });
     await page.waitForURL(/#event=7&/);
     for (const kind of ["Continuous", "POS"]) await page.locator(".chips label", { hasText: kind }).click();
-    await page.evaluate(() => (document.activeElement as HTMLElement).blur());
+    await noFocus(page);
     const before = page.locator('[aria-label^="Previous event: "][aria-label$=" · Parking"]');
     await before.click();
     await page.waitForURL(/#event=5&/);
@@ -151,7 +104,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       const start = busy - 40_000 + at * 8;
       archive.recorded.push({ id: 1_000 + at, camera: 1 + (at % 2), start, stop: start + 8, frames: 80, reason: at % 5 ? 1 : 3 });
     }
-    const page = await opened("#events", 1440, 900);
+    const page = await events.open("#events", 1440, 900);
     const elements = () => page.locator("*").count();
     const listed = () => page.locator(".list-head", { hasText: /^10000 events/ }).waitFor();
     await page.waitForSelector(".day.has");
@@ -167,14 +120,14 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   }, 40_000);
 
   test("a phone has all of it, nothing too small for a finger, and no sideways scrolling", async () => {
-    const page = await opened("#event=14", 390, 844);
+    const page = await events.open("#event=14", 390, 844);
     await state(page, "playing");
     expect(await page.evaluate(smallControls, "button:not(.day), a, summary, select")).toEqual([]);
     expect(await page.evaluate(() => document.documentElement.scrollWidth)).toBe(390);
   }, 40_000);
 
   test("a recording is kept with a note, found again by the filter, and released", async () => {
-    const page = await opened("#event=14", 1440, 900);
+    const page = await events.open("#event=14", 1440, 900);
     await state(page, "playing");
     await page.click("button[aria-label='Keep this recording']");
     await page.keyboard.type("police [4]");
@@ -195,9 +148,9 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   }, 40_000);
 
   test("a span is chosen by keys, by a handle and by camera; its size is told; it is downloaded", async () => {
-    const page = await opened("#event=21", 1440, 900);
+    const page = await events.open("#event=21", 1440, 900);
     await state(page, "playing");
-    await page.evaluate(() => (document.activeElement as HTMLElement).blur());
+    await noFocus(page);
     await page.keyboard.press("x");
     const about = (text: string) => page.locator(".export-about", { hasText: text }).waitFor();
     await about("5 min · about 300 MB");
@@ -223,135 +176,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await end.waitFor({ state: "hidden" });
   }, 40_000);
 
-  const hash = (page: Page) => new URL(page.url()).hash;
-  const noFocus = (page: Page) => page.evaluate(() => (document.activeElement as HTMLElement).blur());
-
-  test("cameras are added in empty cells, play in step, one large and back; a closed one ends its player", async () => {
-    client.server.cameras.push({ id: 3, name: "Gate", video_type: 1 });
-    const page = await opened(`#event=14&at=${(noon + 1260) * 1000}`, 1440, 900, 9);
-    await state(page, "paused");
-    expect(await page.isDisabled("button[aria-label^='Three by three']"), "six connections over HTTP/1.1").toBe(true);
-    await page.keyboard.press("2");
-    for (const name of ["Parking", "Gate"]) await page.locator(".stage-cell select").first().selectOption({ label: name });
-    await page.locator(".message-sentence", { hasText: "No recording at 12:21:00." }).waitFor();
-    await noFocus(page);
-    await page.keyboard.press(" ");
-    await page.locator(".stage-picture[data-state=playing]").nth(1).waitFor();
-    for (const rate of ["]", "]", "["]) {
-      await page.keyboard.press(rate);
-      await page.waitForTimeout(600);
-      const [one, other] = (await captions(page)).map((text) => Date.parse(`1 Jan 2000 ${text.split(" ").at(-1)}`));
-      // Frames are 100 ms apart, and the rate leaves at most three of four out.
-      expect(Math.abs(one! - other!)).toBeLessThanOrEqual(400);
-    }
-    await page.keyboard.press("Enter");
-    await expect(page.locator(".stage > :visible").count()).resolves.toBe(1);
-    await page.keyboard.press("Escape");
-    await page.locator(".stage-picture").nth(1).dblclick();
-    expect(await page.locator(".stage-picture.is-large canvas").getAttribute("aria-label")).toBe("Recording of Parking");
-    await page.locator(".stage-picture.is-large").dblclick();
-    await expect(page.locator(".stage > :visible").count()).resolves.toBe(4);
-    expect(archive.streams.length).toBe(2);
-    await page.locator(".stage-picture").nth(1).hover();
-    await page.click("button[aria-label='Close Parking']");
-    await vi.waitFor(() => expect(archive.streams.length).toBe(1), { timeout: 500 });
-    client.server.cameras.pop();
-  }, 40_000);
-
-  test.each(["mouse", "keys"] as const)("the playhead that is dragged with %s shows stills, and plays where it is let go", async (how) => {
-    const page = await opened("#event=14", 1440, 900);
-    await state(page, "playing");
-    archive.stills.length = 0;
-    const before = (await captions(page))[0]!;
-    const { x, y, width } = (await page.locator(".timeline-axis").boundingBox())!;
-    if (how === "mouse") {
-      // The recording is an eighth of the width from the left, and there are forty minutes more.
-      await page.mouse.move(x + width * 0.13, y + 10);
-      await page.mouse.down();
-      await page.evaluate(() => {
-        const seen = ((globalThis as { seen?: number }).seen = 0);
-        const count = () => ((globalThis as { seen?: number }).seen = ((globalThis as { seen?: number }).seen ?? seen) + 1);
-        new MutationObserver(count).observe(document.querySelector(".stage-time")!, { childList: true, subtree: true });
-      });
-      const began = Date.now();
-      for (let step = 0; Date.now() - began < 1500; step += 1) await page.mouse.move(x + width * 0.13 + (step % 60), y + 10);
-      const seen = await page.evaluate(() => (globalThis as { seen?: number }).seen!);
-      expect(seen / ((Date.now() - began) / 1000), "pictures a second").toBeGreaterThanOrEqual(10);
-    } else {
-      await page.keyboard.press("Tab");
-      await page.focus(".timeline-lanes");
-      for (let press = 0; press < 15; press += 1) await page.keyboard.down("ArrowRight");
-    }
-    await vi.waitFor(() => expect(archive.stills.length).toBeGreaterThan(2));
-    expect(archive.streams, "nothing plays meanwhile").toEqual([]);
-    await vi.waitFor(async () => expect((await captions(page))[0]).not.toBe(before));
-    archive.asked.length = 0;
-    const shown = await page.locator(".timeline-lanes").getAttribute("aria-valuenow");
-    await (how === "mouse" ? page.mouse.up() : page.keyboard.up("ArrowRight"));
-    await state(page, "playing");
-    const [, id, frame] = /^event(\d+) frame (\d+) /.exec(archive.asked.at(-1)!)!;
-    expect(Math.abs(noon + (Number(id) - 10) * 300 + Number(frame) / 10 - Number(shown))).toBeLessThan(1.5);
-  }, 40_000);
-
-  test("a picture of the time under the pointer; ten seconds back; live and back", async () => {
-    const page = await opened(`#event=14&at=${(noon + 1260) * 1000}`, 1440, 900);
-    await state(page, "paused");
-    const { x, y, width } = (await page.locator(".timeline-lanes").boundingBox())!;
-    await page.mouse.move(x + width * 0.13, y + 10);
-    await page.locator(".timeline-hint img.loaded").waitFor();
-    await page.keyboard.press("j");
-    await vi.waitFor(async () => expect((await captions(page))[0]).toMatch(/12:20:50\.0$/));
-    await page.waitForURL(new RegExp(`at=${(noon + 1250) * 1000}&`));
-    await page.click(".transport-live");
-    await page.waitForSelector(".large");
-    expect(hash(page)).toBe("#camera=1");
-    await page.keyboard.press("Escape");
-    await vi.waitFor(async () => expect((await captions(page))[0]).toMatch(/12:20:50\.0$/));
-  }, 40_000);
-
-  test("a link holds cameras, layout, time and filter; Back, Forward and reload lead to the same pictures", async () => {
-    const link = `#event=14&at=${(noon + 1260) * 1000}&layout=2&cameras=1,0,2,0&filter=1,2&kinds=alarm,pos`;
-    const page = await opened(link, 1440, 900, 9);
-    const paused = page.locator(".stage-picture.has-picture[data-state=paused]");
-    const seen = async () => [hash(page), await captions(page), await page.locator(".stage > *").evaluateAll((all) => all.map(({ className }) => className.includes("picture")))];
-    await paused.nth(1).waitFor();
-    expect(await page.locator(".chips input").evaluateAll((all) => all.map((box) => (box as HTMLInputElement).checked))).toEqual([false, true, false, true, false]);
-    const first = await seen();
-    expect(first[0]).toBe(link);
-    await page.keyboard.press("t");
-    const day = new Date(noon * 1000).toLocaleDateString("sv");
-    await page.keyboard.type("25:00");
-    await page.keyboard.press("Enter");
-    await page.locator("dialog .form-message", { hasText: "Please type a time" }).waitFor();
-    await page.getByLabel("Time", { exact: true }).fill(`${day} 12:40:30`);
-    await page.keyboard.press("Enter");
-    await vi.waitFor(async () => expect(await captions(page)).toEqual([expect.stringContaining("12:40:30.0"), expect.stringContaining("12:40:30.0")]));
-    await page.waitForURL(/#event=18&at=/);
-    const second = await seen();
-    await page.goBack();
-    await vi.waitFor(async () => expect(await seen()).toEqual(first));
-    await page.goForward();
-    await vi.waitFor(async () => expect(await seen()).toEqual(second));
-    await page.reload();
-    await vi.waitFor(async () => expect(await seen()).toEqual(second), 10_000);
-    await page.evaluate(() => localStorage.clear());
-  }, 40_000);
-
-  test("the same moment on all cameras, from a card of the list and from the player", async () => {
-    const page = await opened("#pos=90", 1440, 900, 9);
-    await state(page, "playing");
-    await page.locator("[data-ref=pos90] .row-all").click({ force: true });
-    await page.locator(".stage[data-layout='2'] .stage-picture[data-state=playing]").nth(1).waitFor();
-    expect(hash(page)).toMatch(/^#pos=90&.*&cameras=2,1,0,0&/);
-    await page.locator("[data-ref=event40] .row-open, [data-ref=event10] .row-open").first().waitFor({ state: "attached" });
-    await page.keyboard.press("1");
-    await page.locator(".stage[data-layout='1']").waitFor();
-    await page.keyboard.press("a");
-    await page.locator(".stage[data-layout='2'] .stage-picture[data-state=playing]").nth(1).waitFor();
-  }, 40_000);
-
   test("a phone, too, says that there is nothing only once it knows", async () => {
-    const page = await opened("#events", 390, 844);
+    const page = await events.open("#events", 390, 844);
     const note = await page.waitForFunction(() => document.querySelector(".list-note")?.textContent);
     const first = new Date(new Date().setDate(1));
     const isOnCalendar = noon * 1000 >= first.setDate(1 - ((first.getDay() + 6) % 7));
