@@ -1,7 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine cameras
-# of one moment. And what the server then still runs.
+# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine
+# cameras of one moment. And what the server then still runs.
 import base64
 import json
 import subprocess

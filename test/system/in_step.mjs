@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to nine cameras of one moment: in step for a while and after changes of the rate, the playhead dragged, one closed.
-// CAMERAS are their ids, AT is the Unix time in milliseconds to begin at.
+// One visit to nine cameras of one moment: in step for a while and after changes of the rate, the playhead dragged, one
+// closed. CAMERAS are their ids, AT is the Unix time in milliseconds to begin at.
 import { address, folder, logIn, report, violations, visit } from "./chromium.mjs";
 
 await visit(async (page, complaints) => {

@@ -2,11 +2,12 @@
 #
 # Reads the frame number and the time of day that the test pattern paints into each picture.
 #
-# The font is learned: in a row of pictures the last digit of the number runs through all ten shapes, and it is a zero where the
-# digit before it changes. Of the time, the seconds are known from when the picture was captured.
+# The font is learned: in a row of pictures the last digit of the number runs through all ten shapes, and it is a zero
+# where the digit before it changes. Of the time, the seconds are known from when the picture was captured.
 import subprocess
 
-# At the lower right, "frame 000123" and above it "12:34:56.789": how many characters, their height, and how far up they stand.
+# At the lower right, "frame 000123" and above it "12:34:56.789": how many characters, their height, and how far up they
+# stand.
 NUMBER = 6, 3, 7
 CLOCK = 12, 5, 13
 

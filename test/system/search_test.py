@@ -70,6 +70,31 @@ class SearchTest(unittest.TestCase):
             found = self.ask(PLAYER, "EnumEvent", **{"cameralists": "1,2,3,4", "from": now - 3600, "to": now, **by})["camera"]
             self.assertEqual([entry["camera_id"] for entry in found], cameras)
 
+    def test_words_find_what_a_mark_says_for_those_who_may_see_its_camera(self):
+        form = {"kind": "pos", "camera": 2, "text": "1 Coffee 2.80\nTotal 2.80 searched"}
+        mark = self.server.request(call("VEXO.Event", "Mark"), "admin", form=form).json["data"]["id"]
+        rows = [
+            # who, which words, of which cameras and kinds: whether it is found
+            ("admin", "searched COFFEE", {}, True),
+            ("viewer", "searched", {"cameralists": "2"}, True),
+            ("admin", "searched", {"cameralists": "1"}, False),
+            ("admin", "searched", {"kind": "alert"}, False),
+            ("admin", "searched tea", {}, False),
+            ("admin", "search", {}, False),
+            ("denied", "searched", {}, False),
+            ("denied", "searched", {"cameralists": "2"}, False),
+        ]
+        for who, text, where, is_found in rows:
+            if who == "denied":
+                self.server.cli("user", "deny", "viewer", "2")
+                self.addCleanup(self.server.cli, "user", "allow", "viewer", "2")
+            with self.subTest(who, text=text, **where):
+                account = "admin" if who == "admin" else "viewer"
+                found = self.server.request(call("VEXO.Event", "List", text=text, **where), account).json["data"]["event"]
+                self.assertEqual([one["id"] for one in found], [mark] * is_found)
+                for one in found:
+                    self.assertIn("searched", one["found"][1][1::2])
+
 
 class RecordedNowTest(unittest.TestCase):
     """What the recorder records in this very test."""

@@ -25,7 +25,9 @@ export class FootageLookup {
     return this.#events(camera, atMs / 1000, atMs / 1000).findLast((event) => covers(event, atMs)) ?? null;
   }
 
-  /** Learns what the cameras have at that time and for a while after; with `refresh` also what was still being recorded. */
+  /**
+   * Learns what the cameras have at that time and for a while after; with `refresh` also what was still being recorded.
+   */
   load(cameras: readonly number[], atMs: number, refresh = false): Promise<void> {
     return this.#cache.load(cameras, atMs / 1000 - 1, atMs / 1000 + kLookAheadS, refresh);
   }

@@ -2,13 +2,13 @@
 //
 // One clock for players that show the same moment of several cameras.
 //
-// Why so        The server paces each stream by itself: streams begin when they have been opened, follow a change of the rate when
-//               it has reached them, and a busy server or a slow connection delays each by something else. So a frame waits here
-//               until it is due, and the clock waits for players whose next frame has not come. That wait is made once: from then
-//               on the frames of this player come early enough. A player that is waited for in vain is left behind, and has to
-//               join anew.
-// Invariants    (1) Only `set` turns the clock back. (2) Of a player that is not left behind, the frame on the screen is the one
-//               of the clock's time, or that before it while the next is on its way.
+// Why so        The server paces each stream by itself: streams begin when they have been opened, follow a change of
+//               the rate when it has reached them, and a busy server or a slow connection delays each by something
+//               else. So a frame waits here until it is due, and the clock waits for players whose next frame has not
+//               come. That wait is made once: from then on the frames of this player come early enough. A player that
+//               is waited for in vain is left behind, and has to join anew.
+// Invariants    (1) Only `set` turns the clock back. (2) Of a player that is not left behind, the frame on the screen
+//               is the one of the clock's time, or that before it while the next is on its way.
 
 /** How long all wait for one, in milliseconds: for the first frame of a stream, and for each that follows. */
 const kMaxOpeningMs = 3_000;
@@ -71,7 +71,10 @@ export class PlaybackClock {
     this.#plan();
   }
 
-  /** The clock does not pass this time before the player's first frame has come. `intervalMs`: between two frames, or so. */
+  /**
+   * The clock does not pass this time before the player's first frame has come. `intervalMs`: between two frames, or
+   * so.
+   */
   join(who: object, atMs: number, intervalMs: number): void {
     this.leave(who);
     const rest = { held: null, shownMs: null, awaitedSinceMs: null, isLeftBehind: false };
@@ -91,7 +94,10 @@ export class PlaybackClock {
     return this.#members.get(who)?.isLeftBehind ?? false;
   }
 
-  /** Resolves when the player's next frame is to be shown; with false where it is not: it comes too late, or was aborted. */
+  /**
+   * Resolves when the player's next frame is to be shown; with false where it is not: it comes too late, or was
+   * aborted.
+   */
   due(who: object, frameMs: number, signal: AbortSignal): Promise<boolean> {
     const member = this.#members.get(who);
     if (!member || signal.aborted) return Promise.resolve(!signal.aborted);

@@ -29,7 +29,10 @@ const kMaxSilenceMs = 8_000;
 const kRetryMs = 1_000;
 
 export class Player {
-  /** Resolves when a frame of a stream, of that Unix time in milliseconds, is to be shown; with false where it is to be left out. */
+  /**
+   * Resolves when a frame of a stream, of that Unix time in milliseconds, is to be shown; with false where it is to be
+   * left out.
+   */
   pace: (positionMs: number, signal: AbortSignal) => Promise<boolean> = () => Promise.resolve(true);
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
   show: (frame: RecordedFrame, signal: AbortSignal) => Promise<void> = async () => undefined;
@@ -163,7 +166,10 @@ export class Player {
     this.#frameCount = Math.max(this.#frameCount, footage.frameCount);
   }
 
-  /** The frame to begin with; null when the server does not say, which has become the state, or where it is not wanted any more. */
+  /**
+   * The frame to begin with; null when the server does not say, which has become the state, or where it is not wanted
+   * any more.
+   */
   async #locate(start: Start, signal: AbortSignal): Promise<FrameStart | null> {
     if ("index" in start) return start;
     const footage = this.#footage!;

@@ -2,9 +2,10 @@
 //
 // The pictures of a playhead that is dragged: of each camera the newest that was asked for, and few requests at once.
 //
-// Why so        A pointer asks for sixty times a second, and each picture is a process on the server. What was not begun before
-//               the next time was asked for is never fetched. The leading camera comes first; the others get theirs when the
-//               pointer rests. Pictures that come in another order are left out, so that they only go the way of the pointer.
+// Why so        A pointer asks for sixty times a second, and each picture is a process on the server. What was not
+//               begun before the next time was asked for is never fetched. The leading camera comes first; the others
+//               get theirs when the pointer rests. Pictures that come in another order are left out, so that they only
+//               go the way of the pointer.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings, Still } from "../wire/recordings";

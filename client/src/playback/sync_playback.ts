@@ -2,10 +2,10 @@
 //
 // Plays recordings of one or more cameras in step, from one recording to the next.
 //
-// Why so        Recordings of a camera follow each other without a gap, or with hours between. One clock says which moment is
-//               shown; a camera that has nothing then joins as soon as it has. Where none has anything, the clock goes on to
-//               whatever comes next on any camera. One player leads: steps are frames of its camera, and a pause shows what
-//               each camera had at the time of its picture.
+// Why so        Recordings of a camera follow each other without a gap, or with hours between. One clock says which
+//               moment is shown; a camera that has nothing then joins as soon as it has. Where none has anything, the
+//               clock goes on to whatever comes next on any camera. One player leads: steps are frames of its camera,
+//               and a pause shows what each camera had at the time of its picture.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";

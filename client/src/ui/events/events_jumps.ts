@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Ways to another moment than the one that is played: an event, the one before or after, a few seconds on, a time that is typed; and
-// to other cameras of the same moment.
+// Ways to another moment than the one that is played: an event, the one before or after, a few seconds on, a time that
+// is typed; and to other cameras of the same moment.
 
 import type { Direction, EventWalk } from "../../playback/event_walk";
 import type { SyncPlayback } from "../../playback/sync_playback";
@@ -67,7 +67,10 @@ export class EventsJumps {
     if (fromMs !== null) void this.to(Math.min(fromMs + ms, Date.now()));
   }
 
-  /** To a time of the cameras on the stage, once it is known what they have then. With `isLeaving` Back leads to what is left. */
+  /**
+   * To a time of the cameras on the stage, once it is known what they have then. With `isLeaving` Back leads to what is
+   * left.
+   */
   async to(atMs: number, isPlaying = this.#playback.isPlaying, isLeaving = false): Promise<void> {
     this.#towardsMs = atMs;
     await this.#overview.cache.load(this.#stage.cameras, atMs / 1000 - 1, atMs / 1000 + 1, true);
@@ -90,7 +93,10 @@ export class EventsJumps {
     void openDialog(host, { title: "Go to a time", content: [field.root], submit: "Go", attempt });
   }
 
-  /** Shows what other cameras have at the moment of an event, or (null) at the one that is shown; as many as there is room for. */
+  /**
+   * Shows what other cameras have at the moment of an event, or (null) at the one that is shown; as many as there is
+   * room for.
+   */
   async sameMoment(footage: Footage | null): Promise<void> {
     const atMs = footage ? footage.moment * 1000 : this.#playback.playheadMs;
     if (atMs === null) return;

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One player on the stage: its picture with camera and time, and the reason where there is no picture. While the playhead is
-// dragged it shows stills.
+// One player on the stage: its picture with camera and time, and the reason where there is no picture. While the
+// playhead is dragged it shows stills.
 
 import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";

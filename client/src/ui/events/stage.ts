@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The pictures of the cameras that are played in step, in one cell, four or nine; as many at most as may be played at once.
+// The pictures of the cameras that are played in step, in one cell, four or nine; as many at most as may be played at
+// once.
 
 import { kStillWidths, type ScrubRequest } from "../../playback/scrub_stills";
 import type { SyncPlayback } from "../../playback/sync_playback";

@@ -44,7 +44,9 @@ export function withLayout({ cells }: StagePlan, layout: StageLayout, first: num
   return planOf(layout, isLost ? [...cameras.slice(0, room - 1), first] : cameras, maxPlayers);
 }
 
-/** Puts the camera into an empty cell; where there is none, into a larger layout. Null where nothing has room for it. */
+/**
+ * Puts the camera into an empty cell; where there is none, into a larger layout. Null where nothing has room for it.
+ */
 export function withCamera(plan: StagePlan, camera: number, maxPlayers: number): StagePlan | null {
   const cameras = plan.cells.filter((one) => one !== null);
   if (plan.cells.includes(camera)) return plan;

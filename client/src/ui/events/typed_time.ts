@@ -14,7 +14,10 @@ const kNamedDay = /^(\d{1,2})\.?\s+([a-z]{3})[a-z]*(?:\s+(\d{4}))?$/;
 
 export const kTimeExamples = "14:05, mon 14:05, 24 nov 14:05:30, 2026-11-24 14:05, or -10m for ten minutes ago";
 
-/** Unix milliseconds, in the browser's time zone; the last such time where no day or no year is named. Null where it is none. */
+/**
+ * Unix milliseconds, in the browser's time zone; the last such time where no day or no year is named. Null where it is
+ * none.
+ */
 export function typedTime(text: string, nowMs: number): number | null {
   const words = text.trim().toLowerCase().replace(/\s+/g, " ");
   if (words === "now") return nowMs;

@@ -3,9 +3,10 @@
 // What is open on the events' screen, as a part of the address: #events, or #event=7, #alert=8 or #pos=9, and behind it
 //
 //   &at=1764183438123            the picture of that Unix time in milliseconds
-//   &layout=2&cameras=1,0,4      how many cells a row has, and their cameras in order, 0 for an empty one; &large=4 alone
-//   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all; &kept=1 only those kept,
-//                                &text=two+words those with these words in their text
+//   &layout=2&cameras=1,0,4      how many cells a row has, and their cameras in order, 0 for an empty one
+//   &large=4                     the camera of these that is shown alone
+//   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all
+//   &kept=1&text=two+words       of these only what is kept, and what has these words in its text
 //
 // What an address does not say stays as it is.
 
@@ -67,8 +68,8 @@ function moreOf({ kinds, isKeptOnly, words }: ListChoice): string[] {
 }
 
 /**
- * Writes what is shown into the address: as an entry of its own in the history, to which Back leads, or in place of the one
- * before, which it does once in the interval: call it again until the address has it.
+ * Writes what is shown into the address: as an entry of its own in the history, to which Back leads, or in place of the
+ * one before, which it does once in the interval: call it again until the address has it.
  */
 export function recordPlace(place: EventsPlace, isNewEntry: boolean, intervalMs: number): void {
   const before = parsePlace(location.hash);

@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
-// what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera, #map=2&camera=5
-// or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras, with a record of
-// it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a one-time token.
+// what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
+// #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
+// with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
+// one-time token.
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
 //               history has a number, by which a refused step is taken back.

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What lies under the pointer on the timeline: a line through all lanes, and beside it the time, what happened then, and a picture
-// of it once the pointer rests.
+// What lies under the pointer on the timeline: a line through all lanes, and beside it the time, what happened then,
+// and a picture of it once the pointer rests.
 
 import { StillLoader } from "../events/still_loader";
 import { element, setText } from "../widgets/dom";

@@ -8,8 +8,8 @@ const kMaxScale = 8;
 const kDoubleClickScale = 2.5;
 
 /**
- * `picture` fills `frame`, which hides what lies beyond it. A double click magnifies, and another shows the whole again, unless
- * `isTaken` returns true: then it was for something else.
+ * `picture` fills `frame`, which hides what lies beyond it. A double click magnifies, and another shows the whole
+ * again, unless `isTaken` returns true: then it was for something else.
  */
 export function magnify(frame: HTMLElement, picture: HTMLElement, isTaken: () => boolean = () => false): void {
   let scale = 1;
