@@ -5,12 +5,14 @@
 // Why so        A pointer asks for sixty times a second, and each picture is a process on the server. What was not
 //               begun before the next time was asked for is never fetched. The leading camera comes first; the others
 //               get theirs when the pointer rests. Pictures that come in another order are left out, so that they only
-//               go the way of the pointer.
+//               go the way of the pointer. A picture is that of a key frame, which stands for every time until the one
+//               it was asked for: within seconds of H.264 nothing more is fetched.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings, Still } from "../wire/recordings";
 
 const kMaxAtOnce = 3;
+const kKeptSpans = 24;
 /** Few, so that browsers keep what they have seen. */
 export const kStillWidths = [320, 640, 960, 1280] as const;
 
@@ -22,6 +24,15 @@ export interface ScrubRequest {
   widthPx: number;
 }
 
+/** A still that is the answer for all of these times. */
+interface Span {
+  footage: Footage;
+  widthPx: number;
+  fromMs: number;
+  toMs: number;
+  still: Still;
+}
+
 /** `show` gets null where there is no picture. */
 export type ShowStill = (camera: number, still: Still | null) => Promise<void>;
 
@@ -31,8 +42,10 @@ export class ScrubStills {
   #wanted: ScrubRequest[] = [];
   #running = 0;
   #asked = 0;
-  /** By camera, the number of the request that was answered last. */
-  readonly #shown = new Map<number, number>();
+  /** By camera, the number of the request that was answered last, and its answer. */
+  readonly #shown = new Map<number, { number: number; still: Still | null }>();
+  /** Those that were used last come first. */
+  #spans: Span[] = [];
   #end = new AbortController();
 
   constructor(recordings: Recordings, show: ShowStill) {
@@ -52,6 +65,7 @@ export class ScrubStills {
     this.#end = new AbortController();
     this.#wanted = [];
     this.#shown.clear();
+    this.#spans = [];
   }
 
   #pump(): void {
@@ -61,13 +75,37 @@ export class ScrubStills {
   async #fetch({ camera, footage, atMs, widthPx }: ScrubRequest): Promise<void> {
     const signal = this.#end.signal;
     const number = (this.#asked += 1);
+    if (!footage) return this.#deliver(number, camera, null);
+    const known = this.#find(footage, atMs, widthPx);
+    if (known) return this.#deliver(number, camera, known.still);
     this.#running += 1;
     // Where one fails the picture before stays.
-    const still = footage ? await this.#recordings.still(footage, atMs, widthPx, signal).catch(() => undefined) : null;
+    const still = await this.#recordings.still(footage, atMs, widthPx, signal).catch(() => undefined);
     this.#running -= 1;
+    if (!signal.aborted && still) this.#keep({ footage, widthPx, fromMs: Math.min(still.capturedMs, atMs), toMs: atMs, still });
     this.#pump();
-    if (signal.aborted || still === undefined || number < (this.#shown.get(camera) ?? 0)) return;
-    this.#shown.set(camera, number);
-    await this.#show(camera, still);
+    if (!signal.aborted && still) await this.#deliver(number, camera, still);
+  }
+
+  async #deliver(number: number, camera: number, still: Still | null): Promise<void> {
+    const last = this.#shown.get(camera);
+    if (last && number < last.number) return;
+    this.#shown.set(camera, { number, still });
+    if (!last || still === null || still !== last.still) await this.#show(camera, still);
+  }
+
+  #find(footage: Footage, atMs: number, widthPx: number): Span | undefined {
+    const found = this.#spans.find(
+      (one) => one.footage === footage && one.widthPx >= widthPx && one.fromMs <= atMs && atMs <= one.toMs,
+    );
+    if (found) this.#spans = [found, ...this.#spans.filter((one) => one !== found)];
+    return found;
+  }
+
+  /** In place of others of the same picture, which came for earlier or for later times. */
+  #keep(span: Span): void {
+    const isSame = (one: Span) => one.footage === span.footage && one.widthPx === span.widthPx && one.fromMs === span.fromMs;
+    const toMs = Math.max(span.toMs, ...this.#spans.filter(isSame).map((one) => one.toMs));
+    this.#spans = [{ ...span, toMs }, ...this.#spans.filter((one) => !isSame(one))].slice(0, kKeptSpans);
   }
 }

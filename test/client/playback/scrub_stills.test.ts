@@ -56,6 +56,22 @@ describe("the stills of a dragged playhead", () => {
     expect(shown).toContainEqual([2, null]);
   });
 
+  test("until the time that was asked for a key frame stands for all after it, and is not fetched again", async () => {
+    const answerFrom = (at: number, capturedMs: number) => asked[at]!.answer({ jpeg: new Blob(), capturedMs });
+    request(1900);
+    await answerFrom(0, 1000);
+    for (const atMs of [1000, 1400, 1900]) request(atMs);
+    expect(asked).toHaveLength(1);
+    expect(shown).toEqual([[1, 1000]]);
+    request(2500);
+    await answerFrom(1, 2000);
+    request(1500);
+    request(999);
+    request(1901);
+    expect(asked.map(({ atMs }) => atMs)).toEqual([1900, 2500, 999, 1901]);
+    expect(shown).toEqual([[1, 1000], [1, 2000], [1, 1000]]);
+  });
+
   test("one that fails leaves the picture, and its place to the next; nothing comes after the end", async () => {
     for (const atMs of [1, 2, 3, 4]) request(atMs);
     await asked[0]!.answer(new Error("lost"));
