@@ -71,7 +71,8 @@ CostClass CostClassOf(const Call& call) {
     }
     const bool counts_footage =
         call.api == kCameraApi.name && call.method == "List" && call.Parameter("footage") != Json::Value(false);
-    if (counts_footage) {
+    const bool reads_all = call.api == kSystemApi.name && call.method == "Status";
+    if (counts_footage || reads_all) {
         return CostClass::kSearch;
     }
     const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name ||

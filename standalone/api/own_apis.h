@@ -44,7 +44,7 @@ extern const OwnApi kPairingApi;   // the cameras of this host, for a paired hos
 extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends
 extern const OwnApi kPlaybackApi;  // steers a running player of the caller's session
 extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
-extern const OwnApi kSystemApi;    // health and metrics, for those who watch over the installation
+extern const OwnApi kSystemApi;    // health, metrics, checks, audit log and settings of the installation
 extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own password
 
 // Null when there is no such API.

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.System: how the installation is, for monitors, who find it at /healthz and /metrics; and what
-// was changed in it, for managers.
+// VEXO.System: how the installation is, for monitors, who find it at /healthz and /metrics; and for managers its parts
+// with what to do where one is not well, what was changed in it, and what holds for all of it.
 #include <algorithm>
 #include <array>
 #include <limits>
@@ -12,9 +12,12 @@
 #include <json/json.h>
 
 #include "standalone/admin/change.h"
+#include "standalone/admin/settings.h"
 #include "standalone/api/health.h"
 #include "standalone/api/metrics.h"
 #include "standalone/api/own_apis.h"
+#include "standalone/api/revision.h"
+#include "standalone/api/system_status.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/base/text.h"
@@ -129,8 +132,37 @@ std::string Audit(const Call& call) {
     return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {
-    {"Health", Health}, {"Metrics", Metrics}, {"Audit", Audit, Method::Effect::kChanges, Method::Audience::kManagers}};
+std::string Status(const Call& call) {
+    admin::RequireManager(call.Records(), call.Actor());
+    return SuccessAnswer(SystemStatus(call));
+}
+
+std::string Settings(const Call& call) {
+    admin::RequireManager(call.Records(), call.Actor());
+    Json::Value data;
+    Json::Value& list = data["setting"] = Json::arrayValue;
+    for (const admin::Setting& setting : admin::Settings()) {
+        list.append(admin::SettingRecord(call.Records(), setting));
+    }
+    return SuccessAnswer(data);
+}
+
+std::string SetSetting(const Call& call) {
+    Json::Value data;
+    data["setting"] = admin::SetSetting(call.Records(), call.Actor(), call.Parameter("name").asString(),
+                                        SeenRevision(call), call.Parameter("value"));
+    return SuccessAnswer(data);
+}
+
+using enum Method::Effect;
+using enum Method::Audience;
+
+constexpr Method kMethods[] = {{"Health", Health},
+                               {"Metrics", Metrics},
+                               {"Status", Status, kChanges, kManagers},
+                               {"Audit", Audit, kChanges, kManagers},
+                               {"Settings", Settings, kChanges, kManagers},
+                               {"SetSetting", SetSetting, kChanges, kManagers}};
 
 }  // namespace
 

@@ -8,6 +8,8 @@
 #include <cstring>
 #include <filesystem>
 #include <stdexcept>
+#include <string>
+#include <string_view>
 #include <system_error>
 #include <vector>
 
@@ -15,6 +17,7 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/file_descriptor.h"
 
 namespace lookhaven::base {
@@ -58,6 +61,23 @@ bool IsAlive(const ProcessIdentity& process) {
     }
     const std::uint64_t start_ticks = ProcessStartTicks(process.pid);
     return start_ticks == process.start_ticks || start_ticks == kUnknownStart;
+}
+
+std::int64_t StartedAt(const ProcessIdentity& process) {
+    const long ticks_per_second = ::sysconf(_SC_CLK_TCK);
+    if (process.start_ticks == 0 || process.start_ticks == kUnknownStart || ticks_per_second <= 0) {
+        return 0;
+    }
+    const auto started_s =
+        static_cast<std::int64_t>(process.start_ticks / static_cast<std::uint64_t>(ticks_per_second));
+    return WallSeconds() - TimeSinceBoot().seconds + started_s;
+}
+
+bool IsProgramReplaced(pid_t pid) {
+    constexpr std::string_view kMark = " (deleted)";
+    std::array<char, 4096> path{};
+    const ssize_t length = ::readlink(("/proc/" + std::to_string(pid) + "/exe").c_str(), path.data(), path.size());
+    return length > 0 && std::string_view(path.data(), static_cast<std::size_t>(length)).ends_with(kMark);
 }
 
 void RaiseDescriptorLimit() {

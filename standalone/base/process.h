@@ -29,6 +29,13 @@ ProcessIdentity ThisProcess();
 // False once that very process is certainly gone, so that what it holds may be released. True when in doubt.
 bool IsAlive(const ProcessIdentity& process);
 
+// UTC seconds when it started, as the wall clock is now; 0 where that is not known.
+std::int64_t StartedAt(const ProcessIdentity& process);
+
+// Whether another file has taken the place of its program since it started, as an update does. False where that cannot
+// be seen.
+bool IsProgramReplaced(pid_t pid);
+
 // Lets the calling process open as many descriptors as the system ever grants it.
 void RaiseDescriptorLimit();
 

@@ -8,6 +8,7 @@
 
 #include "standalone/backup/backup.h"
 #include "standalone/base/file.h"
+#include "standalone/base/version.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/running.h"
@@ -30,10 +31,9 @@ void Backup(const Console& console, const Request& request) {
     const base::FileDescriptor file = base::OpenFile(request.file, O_WRONLY | O_CREAT | O_EXCL);
     try {
         store::Store store = console.OpenStore();
-        const backup::Summary summary =
-            backup::Write(console.Installation(), store, file.Get(),
-                          request.with_certificate ? backup::Certificate::kIncluded : backup::Certificate::kLeftOut,
-                          LOOKHAVEN_VERSION);
+        const backup::Summary summary = backup::Write(
+            console.Installation(), store, file.Get(),
+            request.with_certificate ? backup::Certificate::kIncluded : backup::Certificate::kLeftOut, base::kVersion);
         if (::fsync(file.Get()) != 0) {
             base::ThrowErrno("cannot write " + request.file);
         }

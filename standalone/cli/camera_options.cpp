@@ -6,6 +6,7 @@
 #include "standalone/base/codec_words.h"
 #include "standalone/cli/units.h"
 #include "standalone/pattern/pattern_source.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::cli {
 
@@ -13,8 +14,6 @@ namespace {
 
 using store::Camera;
 using store::CameraProfile;
-
-const Names<int> kProfiles = {{"high", 0}, {"low", 1}, {"mobile", 2}};
 
 // "640x360"
 void ParsePictureSize(const std::string& text, CameraProfile& profile) {
@@ -47,13 +46,14 @@ void AssignIfGiven(T& target, const std::optional<T>& given) {
 void CameraOptions::AddTo(Command& command) {
     command.Option("--name", name_, "The camera's name")
         .Option("--type", type_, "The video codec (default: probed)", OneOf(base::VideoCodecWords()))
-        .Option("--live", live_profile_, "The profile shown in the live view (initially high)", OneOf(kProfiles))
+        .Option("--live", live_profile_, "The profile shown in the live view (initially high)",
+                OneOf(store::ProfileNames()))
         .Switch("--enable,!--disable", enabled_, "Whether it is shown and recorded")
         .Switch("--ptz,!--no-ptz", ptz_, "Whether it can pan, tilt and zoom")
         .Switch("--audio,!--no-audio", audio_, "Whether it sends audio")
         .Switch("--insecure,!--secure", insecure_,
                 "Whether its HTTPS certificate may be any (initially one that this machine trusts)");
-    for (const auto& [name, number] : kProfiles) {
+    for (const auto& [name, number] : store::ProfileNames()) {
         ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";
         const std::string of = " of the profile " + name;
@@ -93,10 +93,6 @@ void CameraOptions::ApplyTo(Camera& camera) const {
             ParsePictureSize(*given.size, profile);
         }
     }
-}
-
-const Names<int>& ProfileNames() {
-    return kProfiles;
 }
 
 std::string VideoTypeText(const Json::Value& type) {

@@ -43,9 +43,6 @@ class CameraOptions {
     std::array<ProfileOptions, store::kProfileCount> profiles_;
 };
 
-// The names of the profiles and their numbers.
-const Names<int>& ProfileNames();
-
 // base::CodecTitle for a member "video_type".
 std::string VideoTypeText(const Json::Value& type);
 

@@ -4,12 +4,12 @@
 #pragma once
 
 #include <optional>
-#include <sstream>
 #include <stdexcept>
 #include <string>
 #include <string_view>
 #include <utility>
 
+#include "standalone/base/concat.h"
 #include "standalone/base/installation.h"
 #include "standalone/cli/json.h"
 #include "standalone/store/store.h"
@@ -31,13 +31,7 @@ enum ExitCode : int {
     kConfigError = 78,  // store's schema or settings file not valid for this program
 };
 
-// The texts and numbers in a row.
-template <typename... Parts>
-std::string Concat(const Parts&... parts) {
-    std::ostringstream text;
-    (text << ... << parts);
-    return text.str();
-}
+using base::Concat;
 
 // Ends the command with that code and one sentence for the operator, made of the parts.
 class Failure : public std::runtime_error {

@@ -2,36 +2,17 @@
 //
 // lookhaven doctor: looks at every part of a running installation and says what to do.
 #include <algorithm>
-#include <exception>
 
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/doctor/checks.h"
+#include "standalone/doctor/checks.h"
 
 namespace lookhaven::cli {
 
 namespace {
-
-struct Check {
-    const char* name;
-    doctor::Findings (*run)(const base::Installation&);
-};
-constexpr Check kChecks[] = {{"folder", doctor::CheckFolder},
-                             {"store", doctor::CheckStore},
-                             {"cameras", doctor::CheckCameras},
-                             {"mounts", doctor::CheckMounts},
-                             {"host", doctor::CheckHost},
-                             {"web server", doctor::CheckWebServer},
-                             {"certificate", doctor::CheckCertificate},
-                             {"recorder", doctor::CheckRecorder},
-                             {"active recorder", doctor::CheckActiveRecorder},
-                             {"recordings", doctor::CheckRecordings},
-                             {"maintenance", doctor::CheckMaintenance},
-                             {"segments", doctor::CheckSegments},
-                             {"paired hosts", doctor::CheckPairedHosts}};
 
 // What another user may do says nothing of what the server may.
 void RequireOwner(const base::Installation& installation) {
@@ -42,32 +23,20 @@ void RequireOwner(const base::Installation& installation) {
     }
 }
 
-doctor::Findings Run(const Check& check, const base::Installation& installation) {
-    try {
-        return check.run(installation);
-    } catch (const std::exception& error) {
-        return {
-            {Concat(check.name, " cannot be checked: ", error.what()), "correct that and run lookhaven doctor again"}};
-    }
-}
-
 void Examine(const Console& console) {
     const base::Installation installation = console.Installation();
     RequireOwner(installation);
     Json::Value data = Json::arrayValue;
     std::string text;
     std::size_t count = 0;
-    for (const Check& check : kChecks) {
-        const doctor::Findings findings = Run(check, installation);
-        Json::Value list = Json::arrayValue;
+    for (const doctor::Check& check : doctor::Checks()) {
+        const doctor::Findings findings = doctor::Examine(check, installation);
         const auto faults = std::ranges::count(findings, doctor::Severity::kFault, &doctor::Finding::severity);
         text += Concat(findings.empty() ? "ok       " : faults == 0 ? "note     " : "problem  ", check.name, "\n");
         for (const doctor::Finding& finding : findings) {
-            list.append(Object("problem", finding.problem, "remedy", finding.remedy, "severity",
-                               doctor::NameOf(finding.severity)));
             text += "         " + finding.problem + "\n         do: " + finding.remedy + "\n";
         }
-        data.append(Object("check", check.name, "ok", faults == 0, "findings", list));
+        data.append(Object("check", check.name, "ok", faults == 0, "findings", doctor::ToJson(findings)));
         count += static_cast<std::size_t>(faults);
     }
     console.Answer(data, text);

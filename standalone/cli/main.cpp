@@ -11,6 +11,7 @@
 #include "standalone/archive/archive_error.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/state_folder.h"
+#include "standalone/base/version.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/completion.h"
@@ -72,8 +73,8 @@ std::string UsageSentence(const CLI::App& program, const CLI::ParseError& error)
 }
 
 void ShowVersion(const Console& console) {
-    console.Answer(Object("version", LOOKHAVEN_VERSION, "schema", store::Store::SchemaVersion()),
-                   "lookhaven " LOOKHAVEN_VERSION);
+    console.Answer(Object("version", base::kVersion, "schema", store::Store::SchemaVersion()), "lookhaven ",
+                   base::kVersion);
 }
 
 int Run(int argc, char** argv) {

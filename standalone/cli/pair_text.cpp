@@ -6,6 +6,7 @@
 #include "standalone/base/json_text.h"
 #include "standalone/base/text.h"
 #include "standalone/cli/console.h"
+#include "standalone/remote/camera_list.h"
 
 namespace lookhaven::cli {
 
@@ -13,34 +14,12 @@ namespace {
 
 constexpr std::string_view kPrefix = "lookhaven-pair-1:";
 
-// Throws Json::Exception for a member of the wrong type.
-std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
-    std::vector<store::RemoteCamera> cameras;
-    for (const Json::Value& camera : list) {
-        cameras.push_back({.id_on_server = camera["id"].asInt(),
-                           .name = camera["name"].asString(),
-                           .video_type = static_cast<base::Codec>(camera["video"].asInt()),
-                           .audio = camera["audio"].asBool()});
-    }
-    return cameras;
-}
-
 PairOffer Read(const Json::Value& json) {
     return {json["address"].asString(), json["port"].asInt(), json["certificate"].asString(), json["secret"].asString(),
-            CamerasIn(json["cameras"])};
+            remote::CamerasIn(json["cameras"])};
 }
 
 }  // namespace
-
-std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text) try {
-    const Json::Value json = ParseJson(text);
-    if (json.isObject() && json["data"].isObject() && json["data"]["camera"].isArray()) {
-        return CamerasIn(json["data"]["camera"]);
-    }
-    throw Failure(kDataError, "an answer that cannot be understood");
-} catch (const Json::Exception&) {
-    throw Failure(kDataError, "an answer with a member of the wrong type");
-}
 
 std::string ToText(const PairOffer& offer) {
     const Json::Value cameras = Array(offer.cameras, [](const store::RemoteCamera& camera) {

@@ -20,10 +20,6 @@ struct PairOffer {
     std::vector<store::RemoteCamera> cameras;  // server_id is 0
 };
 
-// The cameras in what a host's VEXO.Pairing answers to Cameras; server_id is 0. Throws Failure kDataError for any other
-// text.
-std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text);
-
 std::string ToText(const PairOffer& offer);
 
 // Throws Failure kDataError for any other text.

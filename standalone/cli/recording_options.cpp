@@ -29,7 +29,7 @@ void RecordingOptions::AddTo(Command& command) {
         .Option("--pre", pre_, "Footage kept before an alert or POS transaction, at most 5m (initially 5s)")
         .Option("--post", post_, "Footage kept after it (initially 10s)")
         .Option("--mount", mount_, "The mount to record to; 0 for the default mount")
-        .Option("--record-profile", profile_, "The profile to record (initially high)", OneOf(ProfileNames()));
+        .Option("--record-profile", profile_, "The profile to record (initially high)", OneOf(store::ProfileNames()));
 }
 
 void RecordingOptions::ApplyTo(store::RecordingPlan& plan) const {

@@ -8,9 +8,6 @@
 
 namespace lookhaven::cli {
 
-// Any answer shows that the host accepts connections, forks and responds. Waits three seconds for one.
-bool HostAnswers(const base::Installation& installation);
-
 // For what nobody may use meanwhile. Throws Failure, which says how to stop them, when the host or the recorder runs.
 void RequireStopped(const base::Installation& installation);
 

@@ -15,9 +15,9 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/pair_text.h"
-#include "standalone/cli/paired_host.h"
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
+#include "standalone/remote/paired_host.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 
@@ -107,7 +107,7 @@ std::string ReadPairText() {
 
 // Why the host does not answer and what to do about it, as lines to append to an answer; empty when it answers.
 std::string ConnectionProblem(const RecordingServer& server, const std::string& secret) {
-    const std::string failure = AskPairedHost(server, secret).failure;
+    const std::string failure = remote::AskPairedHost(server, secret).failure;
     return failure.empty() ? ""
                            : Concat("\nIt does not answer at ", server.address, " port ", server.port, ": ", failure,
                                     ".\nThe pairing is kept; if its address or port differs: lookhaven server set ",
@@ -206,7 +206,7 @@ void Refresh(const Console& console) {
     const auto note = [&](const RecordingServer& server, const std::string& failure) {
         failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure);
     };
-    for (const auto& [server, cameras, failure] : AskPairedHosts(store)) {
+    for (const auto& [server, cameras, failure] : remote::AskPairedHosts(store)) {
         if (!failure.empty()) {
             note(server, failure);
             continue;

@@ -2,6 +2,7 @@
 //
 // lookhaven setup-address: the one-time address at which a browser makes the first account.
 #include <algorithm>
+#include <exception>
 #include <filesystem>
 #include <functional>
 #include <system_error>
@@ -12,7 +13,8 @@
 #include "standalone/base/host_name.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/web_listeners.h"
+#include "standalone/doctor/web_listeners.h"
+#include "standalone/remote/certificate.h"
 #include "standalone/store/users.h"
 
 namespace lookhaven::cli {
@@ -27,7 +29,7 @@ struct Request {
 // web server answers at; by itself where that is another's.
 std::vector<std::string> AddressesOf(const base::Installation& installation, const std::string& fragment) {
     std::vector<std::string> addresses;
-    for (const WebListener& listener : WebListenersOf(installation)) {
+    for (const doctor::WebListener& listener : doctor::WebListenersOf(installation)) {
         const std::string host = listener.has_tls ? "https://" + base::OwnHostName() : "http://" + listener.host;
         const std::string address = Concat(host, ":", listener.port, "/", fragment);
         if (std::ranges::find(addresses, address) == addresses.end()) {
@@ -37,7 +39,16 @@ std::vector<std::string> AddressesOf(const base::Installation& installation, con
     return addresses.empty() ? std::vector{fragment} : addresses;
 }
 
-std::string TextOf(const std::vector<std::string>& addresses) {
+// Empty where there is no certificate, or none that can be read, which the doctor tells.
+std::string FingerprintOf(const base::Installation& installation) {
+    try {
+        return remote::ReadCertificate(base::ReadFile(installation.TlsFolder() / "certificate.pem")).fingerprint;
+    } catch (const std::exception&) {
+        return "";
+    }
+}
+
+std::string TextOf(const std::vector<std::string>& addresses, const std::string& fingerprint) {
     constexpr std::int64_t kMinutes = admin::kSetupTokenLifetimeS / 60;
     std::string text = addresses.front().front() == '#'
                            ? Concat("There is no account yet. To make the first one, open Lookhaven's page in a browser"
@@ -48,7 +59,11 @@ std::string TextOf(const std::vector<std::string>& addresses) {
     for (const std::string& address : addresses) {
         text += "\n    " + address;
     }
-    return text + "\n\nIt works once. lookhaven setup-address prints a new one, which replaces it.";
+    text += "\n\nIt works once. lookhaven setup-address prints a new one, which replaces it.";
+    return fingerprint.empty()
+               ? text
+               : text + "\n\nThe fingerprint (SHA-256) of the certificate that the browser then shows:\n\n    " +
+                     fingerprint;
 }
 
 void Print(const Console& console, const Request& request) {
@@ -63,11 +78,12 @@ void Print(const Console& console, const Request& request) {
     }
     const std::vector<std::string> addresses =
         AddressesOf(installation, "#setup=" + admin::NewSetupToken(store, base::TimeSinceBoot()));
-    const std::string text = TextOf(addresses);
+    const std::string fingerprint = FingerprintOf(installation);
+    const std::string text = TextOf(addresses, fingerprint);
     // First: the one before is void already, should there be no room for the file.
-    console.Answer(
-        Object("address", Array(addresses, std::identity()), "seconds", Json::Int64{admin::kSetupTokenLifetimeS}),
-        text);
+    console.Answer(Object("address", Array(addresses, std::identity()), "seconds",
+                          Json::Int64{admin::kSetupTokenLifetimeS}, "fingerprint", fingerprint),
+                   text);
     base::WriteFileAtomically(file, text + '\n');
 }
 

@@ -2,7 +2,6 @@
 #include "standalone/cli/units.h"
 
 #include <cmath>
-#include <cstdio>
 #include <ctime>
 
 #include "standalone/cli/console.h"
@@ -80,44 +79,6 @@ std::int64_t ParseMoment(const std::string& text, std::int64_t now_s) {
         throw Failure(kUsage, "a time looks like 2026-03-01 08:15, 2026-03-01T08:15:30Z, -2h or now");
     }
     return *date;
-}
-
-std::string FormatMoment(std::int64_t moment_s) {
-    const auto time = static_cast<std::time_t>(moment_s);
-    std::tm local{};
-    char text[64];
-    if (::localtime_r(&time, &local) == nullptr || std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &local) == 0) {
-        return std::to_string(moment_s);
-    }
-    return text;
-}
-
-std::string FormatDuration(std::int64_t duration_s) {
-    constexpr struct {
-        const char* name;
-        std::int64_t seconds;
-    } kUnits[] = {{"d", 86400}, {"h", 3600}, {"m", 60}, {"s", 1}};
-    for (std::size_t i = 0; i < std::size(kUnits); ++i) {
-        const std::int64_t count = duration_s / kUnits[i].seconds;
-        const std::int64_t rest =
-            i + 1 < std::size(kUnits) ? duration_s % kUnits[i].seconds / kUnits[i + 1].seconds : 0;
-        if (count > 0) {
-            return Concat(count, kUnits[i].name) + (rest > 0 ? Concat(" ", rest, kUnits[i + 1].name) : "");
-        }
-    }
-    return "0s";
-}
-
-std::string FormatSize(std::int64_t size_bytes) {
-    constexpr const char* kUnits[] = {"B", "KiB", "MiB", "GiB", "TiB"};
-    auto size = static_cast<double>(size_bytes);
-    std::size_t unit = 0;
-    for (; size >= 1024 && unit + 1 < std::size(kUnits); ++unit) {
-        size /= 1024;
-    }
-    char text[32];
-    std::snprintf(text, sizeof text, unit == 0 ? "%.0f %s" : "%.1f %s", size, kUnits[unit]);
-    return text;
 }
 
 }  // namespace lookhaven::cli

@@ -9,7 +9,13 @@
 #include <string>
 #include <string_view>
 
+#include "standalone/base/amounts.h"
+
 namespace lookhaven::cli {
+
+using base::FormatDuration;
+using base::FormatMoment;
+using base::FormatSize;
 
 // Nothing unless the whole text is one number.
 template <typename Number>
@@ -26,12 +32,5 @@ std::int64_t ParseMoment(const std::string& text, std::int64_t now_s);
 std::int64_t ParseDuration(const std::string& text);
 // "64K", "500M", "4G", "1.5T", "0": bytes, in powers of 1024.
 std::int64_t ParseSize(const std::string& text);
-
-// "2026-03-01 08:15:30" in the host's time zone.
-std::string FormatMoment(std::int64_t moment_s);
-// "1d 2h", "5m 10s", "0s": the two largest units.
-std::string FormatDuration(std::int64_t duration_s);
-// "1.5 GiB"
-std::string FormatSize(std::int64_t size_bytes);
 
 }  // namespace lookhaven::cli

@@ -101,6 +101,13 @@ RecorderState FindRecorder(const base::Installation& installation) try {
     return RecorderState::kNone;
 }
 
+std::optional<base::ProcessIdentity> RecorderProcess(const base::Installation& installation) try {
+    const std::optional<Table> table = FindRecord(PathOf(installation));
+    return table && base::IsAlive((*table)->recorder) ? std::optional((*table)->recorder) : std::nullopt;
+} catch (const std::system_error&) {
+    return std::nullopt;
+}
+
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec) {
     const SharedLock lock = TryLock(config.mutex);
     return lock && MonotonicSeconds() - config.timestamp_sec <= max_age_sec;

@@ -8,10 +8,12 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 
 #include <pthread.h>
 
 #include "standalone/base/installation.h"
+#include "standalone/base/process.h"
 #include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
@@ -49,6 +51,8 @@ enum class RecorderState {
     kAlive,
 };
 RecorderState FindRecorder(const base::Installation& installation);
+// Its process; nothing where FindRecorder says that none runs.
+std::optional<base::ProcessIdentity> RecorderProcess(const base::Installation& installation);
 
 // The record was refreshed at most max_age_sec ago. May wait a second for the lock, and is false without it.
 bool IsRecorderAlive(CommonConfig& config, int max_age_sec = 5);

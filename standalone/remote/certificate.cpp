@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/remote/certificate.h"
 
+#include <array>
 #include <ctime>
 #include <memory>
 #include <optional>
+#include <string_view>
 
 #include <openssl/pem.h>
 #include <openssl/x509v3.h>
@@ -59,6 +61,32 @@ std::string CommonName(const X509* certificate) {
     return at < 0 ? "" : TextOf(X509_NAME_ENTRY_get_data(X509_NAME_get_entry(subject, at)));
 }
 
+std::string SubjectOf(const X509* certificate) {
+    const Bio out(BIO_new(BIO_s_mem()), BIO_free_all);
+    constexpr unsigned long kFlags = XN_FLAG_RFC2253 & ~static_cast<unsigned long>(ASN1_STRFLGS_ESC_MSB);
+    if (!out || X509_NAME_print_ex(out.get(), X509_get_subject_name(certificate), 0, kFlags) < 0) {
+        throw InvalidCertificate("the certificate's subject cannot be read");
+    }
+    char* text = nullptr;
+    const long size = BIO_get_mem_data(out.get(), &text);
+    return {text, static_cast<std::size_t>(size)};
+}
+
+std::string FingerprintOf(const X509* certificate) {
+    constexpr std::string_view kDigits = "0123456789ABCDEF";
+    std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};
+    unsigned int size = 0;
+    if (X509_digest(certificate, EVP_sha256(), digest.data(), &size) != 1) {
+        throw InvalidCertificate("the certificate's fingerprint cannot be computed");
+    }
+    std::string text;
+    for (unsigned int i = 0; i < size; ++i) {
+        text += text.empty() ? "" : ":";
+        text += {kDigits[digest[i] >> 4], kDigits[digest[i] & 15]};
+    }
+    return text;
+}
+
 }  // namespace
 
 std::string CertificatesIn(const std::string& pem) {
@@ -88,13 +116,14 @@ std::string CertificateName(const std::string& pem) {
     return name;
 }
 
-std::int64_t CertificateEnd(const std::string& pem) {
+CertificateFacts ReadCertificate(const std::string& pem) {
     const Certificate certificate = RequireFirst(Open(pem));
     std::tm end{};
     if (ASN1_TIME_to_tm(X509_get0_notAfter(certificate.get()), &end) != 1) {
         throw InvalidCertificate("the certificate names no end of its validity");
     }
-    return ::timegm(&end);
+    return {SubjectOf(certificate.get()), FingerprintOf(certificate.get()), ::timegm(&end),
+            X509_self_signed(certificate.get(), 1) == 1};
 }
 
 }  // namespace lookhaven::remote

@@ -22,7 +22,15 @@ std::string CertificatesIn(const std::string& pem);
 // InvalidCertificate when that is no valid host name.
 std::string CertificateName(const std::string& pem);
 
-// UTC seconds when the first certificate expires. Throws InvalidCertificate when there is none.
-std::int64_t CertificateEnd(const std::string& pem);
+// Of the first certificate.
+struct CertificateFacts {
+    std::string subject;      // "CN=nvr", as RFC 4514 writes it
+    std::string fingerprint;  // SHA-256 of its DER form, as browsers show it: "AB:0C:…"
+    std::int64_t end_s = 0;   // UTC seconds when it expires
+    bool is_self_signed = false;
+};
+
+// Throws InvalidCertificate when there is none, or one without an end.
+CertificateFacts ReadCertificate(const std::string& pem);
 
 }  // namespace lookhaven::remote

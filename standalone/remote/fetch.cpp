@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/remote/fetch.h"
 
-#include <dlfcn.h>
-
+#include "standalone/remote/library.h"
 #include "standalone/remote/transfer.h"
 
 namespace lookhaven::remote {
@@ -15,12 +14,7 @@ constexpr std::size_t kMaxJsonBytes = 1 << 20;
 constexpr std::chrono::seconds kMaxJsonDuration{10};
 
 bool Fetch(const Host& host, const Request& request, const Expected& expected, Sink& sink) {
-    void* library = ::dlopen("liblookhaven-remote.so", RTLD_NOW | RTLD_LOCAL);
-    void* function = library == nullptr ? nullptr : ::dlsym(library, "LookhavenFetch");
-    if (function == nullptr) {
-        throw std::runtime_error(std::string("cannot load liblookhaven-remote.so: ") + ::dlerror());
-    }
-    return reinterpret_cast<decltype(&LookhavenFetch)>(function)(host, request, expected, sink);
+    return reinterpret_cast<decltype(&LookhavenFetch)>(FindInLibrary("LookhavenFetch"))(host, request, expected, sink);
 }
 
 class Text : public Sink {

@@ -37,4 +37,9 @@ const base::Names<PortType>& PortTypeNames() {
     return names;
 }
 
+const base::Names<int>& ProfileNames() {
+    static const base::Names<int> names = {{"high", 0}, {"low", 1}, {"mobile", 2}};
+    return names;
+}
+
 }  // namespace lookhaven::store

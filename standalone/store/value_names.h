@@ -17,5 +17,6 @@ const base::Names<CameraAccess>& CameraAccessNames();  // live, playback, audio
 const base::Names<MarkKind>& MarkKindNames();          // alert, pos
 const base::Names<EmapItemType>& DeviceKindNames();    // door, io, pos
 const base::Names<PortType>& PortTypeNames();          // in, out
+const base::Names<int>& ProfileNames();                // of a camera's profiles: high, low, mobile
 
 }  // namespace lookhaven::store

@@ -29,6 +29,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
             const std::string certificates = remote::CertificatesIn(pem);
             fuzz::Require(remote::CertificatesIn(certificates) == certificates);
             const std::string name = remote::CertificateName(pem);
+            fuzz::Require(remote::ReadCertificate(pem).fingerprint.size() == 95);
             fuzz::Require(!name.empty() && name.find_first_of(" \t\r\n\"';{}$\\#") == name.npos);
         } catch (const remote::InvalidCertificate&) {
         }

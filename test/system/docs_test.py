@@ -30,11 +30,13 @@ def shape(value):
 
 
 def words(server):
-    """What stands for the words with a dollar sign: an event of the demo, the day around it, the mount and the account viewer."""
+    """What stands for the words with a dollar sign: an event of the demo, the day around it, the mount, the setting and the account viewer."""
     now = int(time.time())
     accounts = server.request(call("VEXO.User", "List"), "admin", {}).json["data"]["user"]
     mounts = server.request(call("VEXO.Mount", "List"), "admin", {}).json["data"]["mount"]
+    settings = server.request(call("VEXO.System", "Settings"), "admin", {}).json["data"]["setting"]
     return {
+        "$SETTING_REVISION": str(next(one["revision"] for one in settings if one["name"] == "marks_per_day")),
         "$ADMIN_PASSWORD": PASSWORDS["admin"].replace(" ", "+"),
         "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),
         "$MOUNT_REVISION": str(mounts[0]["revision"]),

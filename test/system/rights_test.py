@@ -78,7 +78,10 @@ POST Playback.Stop timestamp=1                                        E      E  
 Relay.Play server=2 camera={camera}                                   E      E     S/N     N     D/N  S/N     S/N      S/N    S/N     E
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
+POST System.Status                                                    E      E     F       F     F    F       F        F      D       E
 POST System.Audit                                                     E      E     F       F     F    F       F        F      D       E
+POST System.Settings                                                  E      E     F       F     F    F       F        F      D       E
+POST System.SetSetting name=cms value=x revision=1                    E      E     F       F     F    F       F        F      B       E
 POST Mount.List                                                       E      E     F       F     F    F       F        F      D       E
 POST Mount.Add path=/etc                                              E      E     F       F     F    F       F        F      B       E
 POST Mount.Set id={mount} revision=1                                  E      E     F       F     F    F       F        F      C/N     E

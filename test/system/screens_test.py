@@ -36,6 +36,7 @@ class ScreensTest(unittest.TestCase):
                 ("account", "Accounts", None),
                 ("storage", "Storage", "Storage"),
                 ("mount", "Storage", None),
+                ("system", "System", "System"),
                 ("audit", "Audit log", "Audit log"),
             ]:
                 seen = visit.see(name)

@@ -89,6 +89,14 @@ await visit(async (page, complaints) => {
   await page.screenshot({ path: `${folder}/accounts.png` });
   await report("account", { word: kWord, row: await page.locator(".record-row", { hasText: "night" }).innerText() });
 
+  await page.evaluate(() => void (location.hash = "#settings=system"));
+  await page.locator(".health-summary").waitFor({ timeout: 30_000 });
+  await page.getByLabel("Recordings side by side").fill("5");
+  await page.getByRole("button", { name: "Save", exact: true }).click();
+  await page.getByText("The settings are saved.").waitFor();
+  await page.screenshot({ path: `${folder}/system.png`, fullPage: true });
+  await report("system", { text: await page.locator(".settings-content").innerText() });
+
   await page.evaluate(() => void (location.hash = "#settings=audit"));
   await page.locator(".audit-entry").first().waitFor();
   await report("audit", { entries: await page.locator(".audit-what").allInnerTexts() });

@@ -34,6 +34,10 @@ class SetupTest(unittest.TestCase):
         start = f"http://127.0.0.1:{server.port}/"
         token = re.search(rf"^ *{re.escape(start)}#setup=([0-9a-f]{{48}})$", server.said(), re.M)[1]
         self.assertIn(f":{server.tls_port}/#setup={token}", server.said())
+        told = subprocess.run(["openssl", "x509", "-noout", "-fingerprint", "-sha256", "-in", server.home / "tls/certificate.pem"],
+                              capture_output=True, text=True, check=True).stdout
+        fingerprint = told.partition("=")[2].strip()
+        self.assertIn(f"\n    {fingerprint}\n", server.said())
         server.stop()
         server.start()
         newer = re.search(rf"{re.escape(start)}#setup=([0-9a-f]{{48}})", server.said())[1]
@@ -54,6 +58,7 @@ class SetupTest(unittest.TestCase):
         server.stop()
         server.start()
         self.assertNotIn("#setup", server.said())
+        self.assertIn(f"fingerprint (SHA-256) {fingerprint}\n", server.said())
 
     @unittest.skipUnless(CAMERA.exists(), "the simulated camera is not built")
     def test_a_camera_a_plan_and_an_account(self):
@@ -85,8 +90,17 @@ class SetupTest(unittest.TestCase):
             self.assertEqual([one["name"] for one in listed.json["data"]["camera"]], ["Loading bay"])
             self.assertEqual(self.kinds(server, camera["id"], session), {"image"})
             self.assertEqual(self.kinds(server, camera["id"], server.session("admin")), {"image", "audio"})
-            wanted = ["Account added: night (", "Map changed: Dock (", "Map added: Loading dock (",
-                      "Camera changed: Loading bay (", "Camera group added: Deliveries (", "Camera added: Loading bay ("]
+            seen = visit.see("system")["text"]
+            told = subprocess.run(["openssl", "x509", "-noout", "-fingerprint", "-sha256", "-in", server.home / "tls/certificate.pem"],
+                                  capture_output=True, text=True, check=True).stdout
+            for text in (told.partition("=")[2].strip(), "Recorder\nrunning since", "SQLite, schema"):
+                self.assertIn(text, seen)
+            self.assertNotIn("Not checked", seen)
+            shown = json.loads(server.cli("setting", "show", "--json"))
+            self.assertEqual(shown["players_per_session"], "5")
+            wanted = ["Setting changed: players_per_session", "Account added: night (", "Map changed: Dock (",
+                      "Map added: Loading dock (", "Camera changed: Loading bay (", "Camera group added: Deliveries (",
+                      "Camera added: Loading bay ("]
             entries = visit.see("audit")["entries"]
             self.assertEqual([entry[: len(text)] for entry, text in zip(entries, wanted)], wanted)
             self.assertNotIn(account["word"], json.dumps(server.request(

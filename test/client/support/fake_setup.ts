@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Cameras, groups, e-maps, accounts and mounts that are set up, with revisions, and the password "right" of the manager.
+// Cameras, groups, e-maps, accounts, mounts and settings, with revisions, and the password "right" of the manager.
 
 import type { CameraRecord } from "../../../client/src/wire/camera_setup";
 import type { DeviceRecord } from "../../../client/src/wire/devices";
@@ -8,6 +8,7 @@ import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { UserRecord } from "../../../client/src/wire/accounts";
+import type { SettingRecord, SystemStatus } from "../../../client/src/wire/system";
 
 type Request = Record<string, never> & { id: number };
 type Answer = { status: number; success: boolean; data?: unknown; error?: unknown };
@@ -29,6 +30,8 @@ export class FakeSetup {
   readonly device: DeviceRecord[] = [];
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
+  readonly setting: SettingRecord[] = [];
+  status: SystemStatus | null = null;
   /** The answer of a probe. */
   probe: unknown = null;
   /** What a new limit deletes. */
@@ -54,6 +57,9 @@ export class FakeSetup {
     "VEXO.Emap.List": () => ok({ emap: this.emap }),
     "VEXO.Emap.Rename": ({ emap, ...rest }) => this.#set("emap", { ...rest, id: Number(emap) } as Request),
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
+    "VEXO.System.Status": () => ok(this.status),
+    "VEXO.System.Settings": () => ok({ setting: this.setting }),
+    "VEXO.System.SetSetting": (request) => this.#setSetting(request),
   };
 
   #set(kind: "camera" | "user" | "mount" | "group" | "emap" | "device", request: Request): Answer {
@@ -62,6 +68,14 @@ export class FakeSetup {
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
     Object.assign(record, changes, { revision: record.revision + 1 });
     return this.#note(kind, request, ok({ [kind]: record }));
+  }
+
+  #setSetting(request: Request): Answer {
+    const { name, value, revision } = request as unknown as SettingRecord;
+    const record = this.setting.find((one) => one.name === name)!;
+    if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
+    Object.assign(record, { value, revision: revision + 1 });
+    return this.#note("SetSetting", request, ok({ setting: record }));
   }
 
   #note(method: string, request: Request, answer: Answer): Answer {

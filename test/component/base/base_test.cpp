@@ -27,6 +27,7 @@
 #include "standalone/base/service_manager.h"
 #include "test/support/folder.h"
 #include "test/support/process.h"
+#include "test/support/wait.h"
 
 namespace lookhaven::base {
 namespace {
@@ -77,6 +78,23 @@ TEST(ProcessIdentityTest, ACommandNameWithParenthesesAndSpacesDoesNotShiftTheFie
         EXPECT_EQ(ThisProcess().start_ticks, before) << hostile;
     }
     ASSERT_GT(::write(OpenFile("/proc/self/comm", O_WRONLY).Get(), name.data(), name.size()), 0);
+}
+
+TEST_F(FileTest, AnUpdateOfARunningProgramIsSeen) {
+    const auto program = path_ / "sleep";
+    std::filesystem::copy("/bin/sleep", program);
+    const pid_t child = test::InChild([&] { ::execl(program.c_str(), "sleep", "1000", nullptr); });
+    const auto running = "/proc/" + std::to_string(child) + "/exe";
+    EXPECT_TRUE(test::Eventually([&] { return std::filesystem::read_symlink(running) == program; }));
+    EXPECT_FALSE(IsProgramReplaced(child));
+    EXPECT_NEAR(static_cast<double>(StartedAt({child, ProcessStartTicks(child)})), static_cast<double>(WallSeconds()),
+                60);
+    std::filesystem::copy("/bin/sleep", path_ / "new");
+    std::filesystem::rename(path_ / "new", program);
+    EXPECT_TRUE(IsProgramReplaced(child));
+    test::KillAndWait(child);
+    EXPECT_FALSE(IsProgramReplaced(child)) << "it is gone";
+    EXPECT_EQ(StartedAt({child, ProcessStartTicks(child)}), 0);
 }
 
 TEST_F(FileTest, AFailedReplacementLeavesTheOldFile) {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven setup-address: what it prints, whom it leaves it to, and that it stops once there is an account.
+#include <cstdlib>
 #include <fstream>
 #include <regex>
 
@@ -56,6 +57,26 @@ TEST_F(SetupAddress, IsThatOfTheWebServerAndTheNewestAloneIsValid) {
     EXPECT_EQ(base::ReadFile(file_), text);
     EXPECT_EQ(std::filesystem::status(file_).permissions(), std::filesystem::perms(0600));
     EXPECT_EQ(TokenIn(Run("setup-address --json").text), "valid");
+    EXPECT_THAT(text, Not(HasSubstr("fingerprint"))) << "there is no certificate";
+}
+
+TEST_F(SetupAddress, TellsTheFingerprintOfTheCertificate) {
+    const std::string tls = (home_ / "tls").string();
+    const std::string certificate = tls + "/certificate.pem";
+    ASSERT_EQ(std::system(("openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -subj /CN=nvr "
+                           "-keyout " +
+                           tls + "/key.pem -out " + certificate +
+                           " 2>/dev/null && openssl x509 -noout "
+                           "-fingerprint -sha256 -in " +
+                           certificate + " > " + tls + "/told")
+                              .c_str()),
+              0);
+    const std::string told = base::ReadFile(tls + "/told");
+    const std::string fingerprint = told.substr(told.find('=') + 1, 95);
+    EXPECT_THAT(Run("setup-address").text, HasSubstr("\n    " + fingerprint + "\n"));
+    EXPECT_THAT(Run("setup-address --json").text, HasSubstr("\"fingerprint\" : \"" + fingerprint + "\""));
+    std::ofstream(certificate) << "nothing";
+    EXPECT_EQ(TokenIn(Run("setup-address").text), "valid");
 }
 
 TEST_F(SetupAddress, IsRefusedOnceThereIsAnAccount) {

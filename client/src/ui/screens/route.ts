@@ -12,7 +12,9 @@
 import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
-export const kSettingsSections = ["cameras", "groups", "maps", "devices", "accounts", "storage", "audit"] as const;
+export const kSettingsSections = [
+  "cameras", "groups", "maps", "devices", "accounts", "storage", "system", "audit",
+] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kCameraPattern = /^#camera=(\d+)$/;

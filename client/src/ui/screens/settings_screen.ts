@@ -14,6 +14,7 @@ import { GroupsPage } from "../settings/groups/groups_page";
 import { MapsPage } from "../settings/maps/maps_page";
 import { MountPage } from "../settings/storage/mount_page";
 import { StoragePage } from "../settings/storage/storage_page";
+import { SystemPage } from "../settings/system/system_page";
 import { element } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
@@ -30,6 +31,7 @@ const kSections: Record<MenuSection, [label: string, icon: IconName]> = {
   maps: ["Maps", "map"],
   accounts: ["Accounts", "people"],
   storage: ["Storage", "storage"],
+  system: ["System", "system"],
   audit: ["Audit log", "audit"],
 };
 
@@ -40,6 +42,7 @@ const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
   devices: DevicesPage,
   accounts: AccountsPage,
   storage: StoragePage,
+  system: SystemPage,
   audit: AuditPage,
 };
 

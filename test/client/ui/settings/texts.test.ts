@@ -7,6 +7,7 @@ import { addressProblem, withPath } from "../../../../client/src/ui/settings/cam
 import { kFirstPlan, painted, recordedText, weekText } from "../../../../client/src/ui/settings/cameras/plan";
 import { differences, isSame, merged } from "../../../../client/src/ui/settings/merge";
 import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/accounts/rights";
+import { commandOf, linesOf, summaryText } from "../../../../client/src/ui/settings/system/system_text";
 import { limitsEffect } from "../../../../client/src/ui/settings/storage/storage_text";
 import { bytesText, daysText } from "../../../../client/src/ui/widgets/amounts";
 
@@ -77,4 +78,30 @@ test("amounts change their unit where four digits would be needed", () => {
   expect([0.9, 1, 29.9, 30, 90, 4000].map(daysText)).toEqual(["less than a day", "1 day", "29 days", "4 weeks", "2 months", "more than ten years"]);
   const effect = limitsEffect({ limitBytes: 5e11, limitDays: 20 }, { perDay: 1e11, used: 2e11, free: 9e11 });
   expect(effect.replaceAll("\u00a0", " ")).toContain("about 5 days of footage, 500 GB");
+});
+
+test.each([
+  ["lookhaven init --admin NAME", "lookhaven init --admin NAME"],
+  ["as root: chown -R nvr: '/srv/the disk'", "chown -R nvr: '/srv/the disk'"],
+  ["remount it, as root: mount -o remount,rw /srv; where that fails, see dmesg", null],
+  ["mount -o remount,rw /srv; where that fails, see dmesg", "mount -o remount,rw /srv"],
+  ["lookhaven event list --kept, then lookhaven event release", "lookhaven event list --kept"],
+  ["mount its disk", null],
+  ["free space on its disk, or lower its limit with lookhaven mount set", null],
+])("the command of the remedy %s is %s", (remedy, command) => expect(commandOf(remedy)).toBe(command));
+
+test("what is wrong comes first, and what nobody looked at is not well", () => {
+  const note = { problem: "it expires soon", remedy: "replace it", severity: "note" as const };
+  const fault = { problem: "it is away", remedy: "mount its disk", severity: "fault" as const };
+  const well = { name: "folder", ok: true, finding: [], unchecked: null };
+  const lines = linesOf([
+    well,
+    { name: "store", ok: null, finding: [], unchecked: "not checked here" },
+    { name: "certificate", ok: true, finding: [note], unchecked: null },
+    { name: "mounts", ok: false, finding: [note, fault, fault], unchecked: null },
+  ]);
+  expect(lines.map(({ kind, part }) => `${kind} ${part}`)).toEqual(
+    ["fault mounts", "fault mounts", "note certificate", "note mounts", "unchecked store"]);
+  expect(summaryText(lines)).toBe("2 problems, 2 notes, 1 part not checked");
+  expect(summaryText(linesOf([well]))).toBe("All is well.");
 });

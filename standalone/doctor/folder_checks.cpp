@@ -11,13 +11,16 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
-#include "standalone/cli/console.h"
-#include "standalone/cli/doctor/checks.h"
-#include "standalone/cli/units.h"
+#include "standalone/base/amounts.h"
+#include "standalone/base/concat.h"
+#include "standalone/doctor/checks.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 namespace {
+
+using base::Concat;
+using base::FormatSize;
 
 // The store, its write-ahead log, logs and sessions go on for some days in this.
 constexpr std::uint64_t kMinFreeBytes = 64 << 20;
@@ -61,10 +64,6 @@ Findings CheckPrivacy(const std::string& path) {
 }
 
 }  // namespace
-
-const char* NameOf(Severity severity) {
-    return severity == Severity::kNote ? "note" : "fault";
-}
 
 std::string OwnName() {
     return UserName(::geteuid());
@@ -117,4 +116,4 @@ Findings CheckFolder(const base::Installation& installation) {
     return findings;
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

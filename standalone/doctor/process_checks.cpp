@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The web API host and the recorder: whether they run and do their work.
-#include "standalone/cli/doctor/checks.h"
-#include "standalone/cli/running.h"
 #include "standalone/control/common_config.h"
+#include "standalone/doctor/checks.h"
+#include "standalone/doctor/host_answers.h"
 #include "standalone/store/recorder_lease.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 // An installation of the packages is run by services.
 std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log) {
@@ -56,4 +56,4 @@ Findings CheckActiveRecorder(const base::Installation& installation) {
     return {};
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

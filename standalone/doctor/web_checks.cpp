@@ -9,19 +9,22 @@
 #include <netdb.h>
 #include <sys/socket.h>
 
+#include "standalone/base/amounts.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/concat.h"
 #include "standalone/base/file.h"
 #include "standalone/base/file_descriptor.h"
-#include "standalone/cli/console.h"
-#include "standalone/cli/doctor/checks.h"
-#include "standalone/cli/paired_host.h"
-#include "standalone/cli/units.h"
-#include "standalone/cli/web_listeners.h"
-#include "standalone/remote/certificate.h"
+#include "standalone/doctor/checks.h"
+#include "standalone/doctor/web_listeners.h"
+#include "standalone/remote/certificate_loader.h"
+#include "standalone/remote/paired_host.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 namespace {
+
+using base::Concat;
+using base::FormatMoment;
 
 constexpr int kTimeoutMs = 3000;
 constexpr std::int64_t kNoticeSeconds = 30 * 86400;
@@ -93,7 +96,7 @@ Findings CheckCertificate(const base::Installation& installation) {
         "put a valid certificate.pem and key.pem there and restart the server; a self-signed one that "
         "was made here is replaced when it restarts";
     try {
-        const std::int64_t end_s = remote::CertificateEnd(base::ReadFile(path));
+        const std::int64_t end_s = remote::LoadAndReadCertificate(base::ReadFile(path)).end_s;
         const std::int64_t left_s = end_s - base::WallSeconds();
         if (left_s > kNoticeSeconds) {
             return {};
@@ -110,7 +113,7 @@ Findings CheckPairedHosts(const base::Installation& installation) {
     Findings findings;
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
-        for (const PairedHostAnswer& answer : AskPairedHosts(store)) {
+        for (const remote::PairedHostAnswer& answer : remote::AskPairedHosts(store)) {
             if (!answer.failure.empty()) {
                 findings.push_back(
                     {Concat("the paired host ", answer.server.name, " at ", answer.server.address, " port ",
@@ -126,4 +129,4 @@ Findings CheckPairedHosts(const base::Installation& installation) {
     return findings;
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

@@ -1,24 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/cli/paired_host.h"
+#include "standalone/remote/paired_host.h"
 
 #include <exception>
 #include <future>
 
 #include "standalone/base/clock.h"
-#include "standalone/cli/pair_text.h"
+#include "standalone/remote/camera_list.h"
 #include "standalone/remote/fetch.h"
 #include "standalone/remote/pair_token.h"
 
-namespace lookhaven::cli {
+namespace lookhaven::remote {
 
 PairedHostAnswer AskPairedHost(const store::RecordingServer& server, const std::string& secret) {
     PairedHostAnswer answer{server, {}, {}};
     try {
         const std::string timestamp = std::to_string(base::WallSeconds());
-        const std::string token = remote::MakePairToken(secret, timestamp);
-        answer.cameras = CamerasInAnswer(remote::FetchJson(
-            {server.address, server.port, server.certificate},
-            {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));
+        const std::string token = MakePairToken(secret, timestamp);
+        answer.cameras = CamerasInAnswer(
+            FetchJson({server.address, server.port, server.certificate},
+                      {"api=VEXO.Pairing&version=1&method=Cameras", "timestamp=" + timestamp + "; token=" + token}));
     } catch (const std::exception& failure) {
         answer.failure = failure.what();
     }
@@ -41,4 +41,4 @@ std::vector<PairedHostAnswer> AskPairedHosts(store::Store& store) {
     return answers;
 }
 
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::remote

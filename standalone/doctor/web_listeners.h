@@ -9,7 +9,7 @@
 
 #include "standalone/base/installation.h"
 
-namespace lookhaven::cli {
+namespace lookhaven::doctor {
 
 struct WebListener {
     std::string host;  // by which this machine reaches it: "127.0.0.1" or "::1"
@@ -23,4 +23,4 @@ std::filesystem::path WebServerConfiguration(const base::Installation& installat
 // Empty without a configuration.
 std::vector<WebListener> WebListenersOf(const base::Installation& installation);
 
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::doctor

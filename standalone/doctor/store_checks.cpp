@@ -7,10 +7,10 @@
 
 #include <unistd.h>
 
-#include "standalone/cli/doctor/checks.h"
+#include "standalone/doctor/checks.h"
 #include "standalone/store/users.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 namespace {
 
@@ -60,4 +60,4 @@ Findings CheckStore(const base::Installation& installation) {
     }
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

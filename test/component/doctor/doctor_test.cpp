@@ -28,9 +28,12 @@
 #include "test/component/cli/program.h"
 #include "test/support/process.h"
 
-namespace lookhaven::cli {
+namespace lookhaven::doctor {
 namespace {
 
+using cli::DemoTest;
+using cli::FakeHost;
+using cli::Outcome;
 using testing::HasSubstr;
 
 constexpr uid_t kNobody = 65534;
@@ -53,7 +56,7 @@ class DoctorTest : public DemoTest {
 
     void StartHost(const char* answer = "Status: 401") {
         host_.reset();
-        host_ = std::make_unique<FakeHost>(ListenAt(home_ / "run" / "webapi.sock"), answer);
+        host_ = std::make_unique<FakeHost>(cli::ListenAt(home_ / "run" / "webapi.sock"), answer);
     }
 
     Outcome Examine() {
@@ -152,7 +155,7 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
     const std::string recordings = Recordings();
     const std::string marker = recordings + "/.lookhaven-mount";
     int port = 0;
-    base::FileDescriptor web_port = BindPort(port);
+    base::FileDescriptor web_port = cli::BindPort(port);
     std::unique_ptr<FakeHost> web;
     const maintenance::RecordingStatus refuses{.camera = 1,
                                                .state = maintenance::RecordingState::kNoSignal,
@@ -305,4 +308,4 @@ TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
 }
 
 }  // namespace
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::doctor

@@ -5,19 +5,21 @@
 #include <exception>
 #include <map>
 
-#include "standalone/cli/camera_options.h"
-#include "standalone/cli/console.h"
-#include "standalone/cli/doctor/checks.h"
-#include "standalone/cli/units.h"
+#include "standalone/base/amounts.h"
+#include "standalone/base/concat.h"
 #include "standalone/control/common_config.h"
+#include "standalone/doctor/checks.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/cameras.h"
+#include "standalone/store/value_names.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 namespace {
 
+using base::Concat;
+using base::FormatMoment;
 using base::SignalLoss;
 using maintenance::RecordingState;
 using maintenance::RecordingStatus;
@@ -32,7 +34,7 @@ std::map<int, std::string> LiveSourceOptions(const base::Installation& installat
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
         for (const store::Camera& camera : store::Cameras(store).List()) {
-            for (const auto& [name, number] : ProfileNames()) {
+            for (const auto& [name, number] : store::ProfileNames()) {
                 if (number == camera.live_profile && number != 0) {
                     options.emplace(camera.id, "--" + name + "-source");
                 }
@@ -135,4 +137,4 @@ Findings CheckSegments(const base::Installation& installation) {
     return findings;
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

@@ -8,7 +8,7 @@
 
 #include "standalone/store/servers.h"
 
-namespace lookhaven::cli {
+namespace lookhaven::remote {
 
 struct PairedHostAnswer {
     store::RecordingServer server;
@@ -22,4 +22,4 @@ PairedHostAnswer AskPairedHost(const store::RecordingServer& server, const std::
 // All enabled hosts with an address, at once, so that one that fails or is slow keeps no other from being asked.
 std::vector<PairedHostAnswer> AskPairedHosts(store::Store& store);
 
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::remote

@@ -10,10 +10,10 @@
 
 #include <unistd.h>
 
-#include "standalone/cli/console.h"
-#include "standalone/cli/doctor/checks.h"
-#include "standalone/cli/units.h"
+#include "standalone/base/amounts.h"
+#include "standalone/base/concat.h"
 #include "standalone/control/common_config.h"
+#include "standalone/doctor/checks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/cameras.h"
@@ -22,9 +22,12 @@
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 namespace {
+
+using base::Concat;
+using base::FormatSize;
 
 std::string TitleOf(const store::Mount& mount) {
     return "the mount " + mount.name + " at " + mount.path;
@@ -177,4 +180,4 @@ Findings CheckMaintenance(const base::Installation& installation) {
     return findings;
 }
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

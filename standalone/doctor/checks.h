@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What lookhaven doctor looks at: a function for each part of an installation, in the file of its kind.
+// What is looked at to see whether an installation is well: a function for each part of it, in the file of its kind.
 //
 // Invariants    (1) A check judges as the user who runs it, who must be the one that runs the server.
 //               (2) It changes nothing. Where another check tells the cause, it finds nothing. What it throws, a
@@ -11,12 +11,15 @@
 #pragma once
 
 #include <filesystem>
+#include <span>
 #include <string>
 #include <vector>
 
+#include <json/json.h>
+
 #include "standalone/base/installation.h"
 
-namespace lookhaven::cli::doctor {
+namespace lookhaven::doctor {
 
 enum class Severity {
     kFault,
@@ -32,6 +35,21 @@ struct Finding {
     Severity severity = Severity::kFault;
 };
 using Findings = std::vector<Finding>;
+
+struct Check {
+    const char* name;
+    Findings (*run)(const base::Installation&);
+};
+// All of them.
+std::span<const Check> Checks();
+
+// What the check finds; what it throws is a fault. Blocks as long as a disk, the store, or another host does.
+Findings Examine(const Check& check, const base::Installation& installation);
+
+bool HasFault(const Findings& findings);
+
+// [{"problem", "remedy", "severity"}]
+Json::Value ToJson(const Findings& findings);
 
 // folder_checks.cpp
 Findings CheckFolder(const base::Installation& installation);
@@ -71,4 +89,4 @@ std::string Quoted(const std::string& path);
 // read-only. Empty when nothing does.
 Findings CheckAccess(const std::string& title, const std::string& path);
 
-}  // namespace lookhaven::cli::doctor
+}  // namespace lookhaven::doctor

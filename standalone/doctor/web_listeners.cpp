@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/cli/web_listeners.h"
+#include "standalone/doctor/web_listeners.h"
 
 #include <fstream>
 #include <regex>
 
-namespace lookhaven::cli {
+namespace lookhaven::doctor {
 
 std::filesystem::path WebServerConfiguration(const base::Installation& installation) {
     return installation.RunFolder() / "nginx.conf";
@@ -24,4 +24,4 @@ std::vector<WebListener> WebListenersOf(const base::Installation& installation) 
     return listeners;
 }
 
-}  // namespace lookhaven::cli
+}  // namespace lookhaven::doctor

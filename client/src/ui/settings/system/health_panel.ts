@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What is wrong with the installation, the worst first, and what to do about it; its parts and its certificate.
+
+import type { Certificate, System, SystemStatus } from "../../../wire/system";
+import { asServerError } from "../../../wire/server";
+import { button } from "../../widgets/button";
+import { element } from "../../widgets/dom";
+import { formPart } from "../../widgets/fields";
+import { calendarDate } from "../../widgets/text";
+import { copyable } from "./copyable";
+import { commandOf, kKindNames, linesOf, partName, partText, storeText, summaryText, type Line } from "./system_text";
+
+export class HealthPanel {
+  readonly root = element("div", { class: "form-group" });
+  readonly #system: System;
+  readonly #closed: AbortSignal;
+
+  constructor(system: System, closed: AbortSignal) {
+    this.#system = system;
+    this.#closed = closed;
+  }
+
+  /** Looks at everything, which may take seconds. What was seen before stays until then. */
+  async load(): Promise<void> {
+    const text = element("p", { class: "quiet", role: "status" }, "Checking each part; this may take seconds…");
+    if (this.root.childElementCount === 0) this.root.append(formPart("Health", text));
+    try {
+      const status = await this.#system.status(this.#closed);
+      if (!this.#closed.aborted) this.root.replaceChildren(...content(status));
+    } catch (error) {
+      if (this.#closed.aborted) return;
+      const message = element("p", { role: "alert" }, asServerError(error).message);
+      this.root.replaceChildren(formPart("Health", message, button("Try again", () => void this.load())));
+    }
+  }
+}
+
+function content(status: SystemStatus): HTMLElement[] {
+  const { version, store, part, certificate, check } = status;
+  const lines = linesOf(check);
+  const summary = element("p", { class: "health-summary", role: "status" }, summaryText(lines));
+  const list = lines.length > 0 ? [element("ul", { class: "settings-list health-list" }, ...lines.map(lineRow))] : [];
+  const well = check.filter(({ ok, finding }) => ok && finding.length === 0).map(({ name }) => name);
+  const rest = well.length > 0 ? [element("p", { class: "quiet" }, `Well: ${well.join(", ")}.`)] : [];
+  const facts = factList([
+    ["Version", version],
+    ...part.map((one): [string, string] => [partName(one), partText(one)]),
+    ["Store", storeText(store)],
+  ]);
+  return [
+    formPart("Health", summary, ...list, ...rest),
+    formPart("Parts", facts),
+    formPart("Certificate", ...certificateContent(certificate)),
+  ];
+}
+
+function lineRow({ kind, part, text, remedy }: Line): HTMLElement {
+  const mark = element("strong", { class: `health-mark ${kind}` }, kKindNames[kind]);
+  const head = element("p", {}, mark, ` ${part}: ${text}`);
+  if (!remedy) return element("li", { class: "health-line" }, head);
+  const command = commandOf(remedy);
+  const advice = command === remedy ? [] : [element("p", { class: "health-remedy" }, `To do: ${remedy}`)];
+  return element("li", { class: "health-line" }, head, ...advice, ...(command ? [copyable(command)] : []));
+}
+
+function certificateContent(certificate: Certificate | null): HTMLElement[] {
+  if (!certificate) return [element("p", { class: "quiet" }, "The server has no certificate of its own that can be read.")];
+  const { subject, fingerprint, end, selfSigned } = certificate;
+  const hint = "Browsers ask once about a certificate that is self-signed, and show this fingerprint.";
+  return [
+    factList([
+      ["Subject", subject],
+      ["Expires", calendarDate(end * 1000)],
+      ["Signed by", selfSigned ? "itself" : "an authority"],
+    ]),
+    element("p", { class: "quiet" }, "Fingerprint (SHA-256)"),
+    copyable(fingerprint),
+    ...(selfSigned ? [element("p", { class: "form-hint" }, hint)] : []),
+  ];
+}
+
+export function factList(facts: readonly (readonly [label: string, text: string])[]): HTMLElement {
+  const fact = ([label, text]: readonly [string, string]) =>
+    element("div", {}, element("dt", {}, label), element("dd", {}, text));
+  return element("dl", { class: "mount-facts" }, ...facts.map(fact));
+}

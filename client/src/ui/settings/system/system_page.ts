@@ -1,0 +1,128 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The installation as a whole: its health, its parts, its certificate, and what holds for all of it.
+
+import { asServerError, ServerError } from "../../../wire/server";
+import { System, type SettingRecord } from "../../../wire/system";
+import { settingsAddress } from "../../screens/route";
+import { button, linkButton, whileBusy } from "../../widgets/button";
+import { element } from "../../widgets/dom";
+import { formPart } from "../../widgets/fields";
+import { notify } from "../../widgets/notice";
+import { yesNo } from "../../widgets/text";
+import type { Descriptions } from "../conflict_panel";
+import type { Draft } from "../draft";
+import { changedFrom } from "../merge";
+import { LoadedPage, type PageContext } from "../page";
+import { RecordForm } from "../record_form";
+import { copyable } from "./copyable";
+import { HealthPanel } from "./health_panel";
+import { SettingFields, settingLabel, type Values } from "./setting_fields";
+
+/** All that may be changed as one record; each setting has a revision of its own. */
+interface Stored {
+  revision: 0;
+  settings: readonly SettingRecord[];
+}
+
+const storedOf = (all: readonly SettingRecord[]): Stored => ({ revision: 0, settings: all.filter(({ operator }) => !operator) });
+const valuesOf = ({ settings }: Stored): Values =>
+  Object.fromEntries(settings.map(({ name, value }) => [name, value as number | boolean]));
+
+export class SystemPage extends LoadedPage<SettingRecord[]> {
+  readonly #system: System;
+  readonly #health: HealthPanel;
+  #form: RecordForm<Values, Stored> | null = null;
+
+  constructor(context: PageContext) {
+    const again = button("Check again", (pressed) => void whileBusy(pressed, this.#health.load()));
+    super(context, "System", again);
+    this.#system = new System(context.server);
+    this.#health = new HealthPanel(this.#system, this.closed);
+    void this.start(
+      () => this.#system.settings(),
+      (settings) => {
+        this.#showAll(settings, context.draft);
+        void whileBusy(again, this.#health.load());
+      },
+    );
+  }
+
+  override get isChanged(): boolean {
+    return this.#form?.isChanged ?? false;
+  }
+
+  override get draft(): Draft | null {
+    return this.#form ? this.#form.draft : super.draft;
+  }
+
+  #showAll(all: readonly SettingRecord[], draft: Draft | null): void {
+    const stored = storedOf(all);
+    const form = new RecordForm<Values, Stored>(
+      {
+        fields: new SettingFields(stored.settings),
+        stored,
+        initial: {},
+        settingsOf: valuesOf,
+        save: (values, base) => this.#save(values, base ?? stored),
+        describe: descriptions(stored),
+        onSaved: () => notify("The settings are saved."),
+        noun: "group of settings",
+        submit: "Save",
+        leave: () => void this.#reset(),
+      },
+      draft,
+    );
+    this.#form = form;
+    const operators = formPart("On the server only", ...all.filter(({ operator }) => operator).map(operatorsSetting));
+    const audit = linkButton("Audit log", settingsAddress("audit"));
+    this.show(this.#health.root, form.root, operators, formPart("Who changed what", audit));
+  }
+
+  /** What was typed is given up. */
+  async #reset(): Promise<void> {
+    try {
+      const settings = await this.#system.settings();
+      if (!this.closed.aborted) this.#showAll(settings, null);
+    } catch (error) {
+      notify(asServerError(error).message);
+    }
+  }
+
+  async #save(values: Values, base: Stored): Promise<Stored> {
+    const saved = new Map<string, SettingRecord>();
+    for (const [name, value] of Object.entries(changedFrom(valuesOf(base), values))) {
+      const { revision } = base.settings.find((setting) => setting.name === name)!;
+      try {
+        saved.set(name, await this.#system.set(name, value!, revision));
+      } catch (error) {
+        const { status, code, message } = asServerError(error);
+        if (status !== 409) throw error;
+        throw new ServerError(status, code, message, storedOf(await this.#system.settings()));
+      }
+    }
+    return { ...base, settings: base.settings.map((setting) => saved.get(setting.name) ?? setting) };
+  }
+}
+
+function descriptions({ settings }: Stored): Descriptions<Values> {
+  const text = (value: Values[string]) => (typeof value === "boolean" ? yesNo(value) : String(value));
+  return Object.fromEntries(settings.map(({ name }) => [name, [settingLabel(name), text] as const]));
+}
+
+const kCommands: Record<string, string> = {
+  folders: "lookhaven setting set mount-folders /mnt:/media:/srv",
+  token: "lookhaven setting set monitor-token new",
+};
+
+function operatorsSetting({ name, kind, value, meaning }: SettingRecord): HTMLElement {
+  const text = typeof value === "boolean" ? (value ? "set" : "none") : String(value);
+  const command = kCommands[kind];
+  return element(
+    "div",
+    { class: "form-field" },
+    element("p", {}, element("strong", {}, settingLabel(name)), `: ${text}`),
+    element("p", { class: "form-hint" }, `${meaning.charAt(0).toUpperCase()}${meaning.slice(1)}. Changed with:`),
+    ...(command ? [copyable(command)] : []),
+  );
+}

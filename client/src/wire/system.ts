@@ -1,0 +1,88 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The installation as a whole: what is wrong with it and what to do, its parts, and what holds for all of it. For managers
+// only.
+
+import type { Server } from "./server";
+
+export interface Finding {
+  problem: string;
+  /** What to do; one that begins with a command is that command. */
+  remedy: string;
+  severity: "fault" | "note";
+}
+
+export interface Check {
+  /** "web server" */
+  name: string;
+  /** Whether there is no fault; null where nobody knows. */
+  ok: boolean | null;
+  finding: Finding[];
+  /** Why nobody knows, else null. */
+  unchecked: string | null;
+}
+
+export interface Part {
+  name: string;
+  state: "running" | "hanging" | "stopped";
+  /** Unix seconds. */
+  since: number | null;
+  /** Its program was updated since it started. */
+  replaced: boolean;
+}
+
+export interface Certificate {
+  subject: string;
+  /** SHA-256, "AB:0C:…". */
+  fingerprint: string;
+  /** Unix seconds when it expires. */
+  end: number;
+  selfSigned: boolean;
+}
+
+export interface SystemStatus {
+  version: string;
+  store: { engine: string; schema: number };
+  part: Part[];
+  certificate: Certificate | null;
+  check: Check[];
+}
+
+export interface SettingRecord {
+  name: string;
+  kind: "number" | "switch" | "folders" | "token";
+  value: number | boolean | string;
+  initial: number | boolean | string;
+  min: number | null;
+  max: number | null;
+  meaning: string;
+  /** Only the command line changes it. */
+  operator: boolean;
+  revision: number;
+}
+
+/** Another request waits for a while, and the checks take twelve seconds at most. */
+const kStatusTimeoutMs = 40_000;
+const kApi = "VEXO.System";
+
+export class System {
+  readonly #server: Server;
+
+  constructor(server: Server) {
+    this.#server = server;
+  }
+
+  status(signal: AbortSignal): Promise<SystemStatus> {
+    return this.#server.call(kApi, "Status", {}, { json: {}, signal, timeoutMs: kStatusTimeoutMs });
+  }
+
+  async settings(): Promise<SettingRecord[]> {
+    return (await this.#server.call<{ setting: SettingRecord[] }>(kApi, "Settings", {}, { json: {} })).setting;
+  }
+
+  /** Rejects with status 409 where `revision` is stale. */
+  async set(name: string, value: SettingRecord["value"], revision: number): Promise<SettingRecord> {
+    const json = { name, value, revision };
+    return (await this.#server.call<{ setting: SettingRecord }>(kApi, "SetSetting", {}, { json })).setting;
+  }
+}

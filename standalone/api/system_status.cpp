@@ -1,0 +1,120 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/system_status.h"
+
+#include <chrono>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <unistd.h>
+
+#include "standalone/admin/change.h"
+#include "standalone/base/file.h"
+#include "standalone/base/json_text.h"
+#include "standalone/base/process.h"
+#include "standalone/base/version.h"
+#include "standalone/control/common_config.h"
+#include "standalone/doctor/apart.h"
+#include "standalone/doctor/checks.h"
+#include "standalone/remote/certificate_loader.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+// Longer than another host may take, and less than a request may.
+constexpr std::chrono::seconds kLimit{12};
+
+const char* NameOf(control::RecorderState state) {
+    return state == control::RecorderState::kAlive   ? "running"
+           : state == control::RecorderState::kHangs ? "hanging"
+                                                     : "stopped";
+}
+
+Json::Value PartRecord(const char* name, const char* state, const std::optional<base::ProcessIdentity>& process) {
+    const std::int64_t since_s = process ? base::StartedAt(*process) : 0;
+    Json::Value json;
+    json["name"] = name;
+    json["state"] = state;
+    json["since"] = since_s > 0 ? Json::Value(Json::Int64{since_s}) : Json::Value();
+    json["replaced"] = process && base::IsProgramReplaced(process->pid);
+    return json;
+}
+
+Json::Value Parts(const base::Installation& installation) {
+    const pid_t host = ::getppid();
+    Json::Value list = Json::arrayValue;
+    list.append(
+        PartRecord("recorder", NameOf(control::FindRecorder(installation)), control::RecorderProcess(installation)));
+    list.append(PartRecord("webapi", "running", base::ProcessIdentity{host, base::ProcessStartTicks(host)}));
+    return list;
+}
+
+// Null where the installation has none; the checks say what is wrong with one that cannot be read.
+Json::Value CertificateRecord(const base::Installation& installation) {
+    const std::filesystem::path path = installation.TlsFolder() / "certificate.pem";
+    if (std::error_code ignored; !std::filesystem::exists(path, ignored)) {
+        return {};
+    }
+    const remote::CertificateFacts facts = remote::LoadAndReadCertificate(base::ReadFile(path));
+    Json::Value json;
+    json["subject"] = facts.subject;
+    json["fingerprint"] = facts.fingerprint;
+    json["end"] = Json::Int64{facts.end_s};
+    json["selfSigned"] = facts.is_self_signed;
+    return json;
+}
+
+std::string ReportOf(const doctor::Check& check, const base::Installation& installation) {
+    const doctor::Findings findings = doctor::Examine(check, installation);
+    Json::Value json;
+    json["ok"] = !doctor::HasFault(findings);
+    json["finding"] = doctor::ToJson(findings);
+    return base::OneLineJson(json);
+}
+
+Json::Value CheckRecord(const char* name, const doctor::JobResult& result) {
+    using enum doctor::JobResult::State;
+    Json::Value json;
+    if (result.state == kDone) {
+        json = admin::FromText(result.text);
+        json["unchecked"] = Json::Value();
+    } else {
+        json["ok"] = Json::Value();
+        json["finding"] = Json::arrayValue;
+        json["unchecked"] = std::string("not checked here: it ") +
+                            (result.state == kLate ? "takes more than " + std::to_string(kLimit.count()) + " seconds"
+                                                   : "ended before it was done") +
+                            "; run lookhaven doctor on the server";
+    }
+    json["name"] = name;
+    return json;
+}
+
+}  // namespace
+
+Json::Value SystemStatus(const Call& call) {
+    const base::Installation& installation = call.context.Installation();
+    Json::Value data;
+    data["version"] = base::kVersion;
+    data["store"]["engine"] = installation.StoreUrl().starts_with("sqlite:") ? "sqlite" : "postgresql";
+    data["store"]["schema"] = store::Store::SchemaVersion();
+    data["part"] = Parts(installation);
+    std::vector<doctor::Job> jobs;
+    for (const doctor::Check& check : doctor::Checks()) {
+        jobs.emplace_back([&] { return ReportOf(check, installation); });
+    }
+    jobs.emplace_back([&] { return base::OneLineJson(CertificateRecord(installation)); });
+    call.context.CloseRecords();  // it must not be shared with other processes
+    std::vector<doctor::JobResult> results = doctor::RunApart(jobs, kLimit);
+    data["certificate"] = admin::FromText(results.back().text);
+    data["check"] = Json::arrayValue;
+    for (std::size_t i = 0; i < doctor::Checks().size(); ++i) {
+        data["check"].append(CheckRecord(doctor::Checks()[i].name, results[i]));
+    }
+    return data;
+}
+
+}  // namespace lookhaven::api
