@@ -78,9 +78,11 @@ TEST(FalseSession, CostsNoProcess) {
         return host.Ask("api=Test&version=1&method=Success", cookie, {}, body).status;
     };
     const base::FileDescriptor stream = host.Open("Stream", real);
-    ASSERT_TRUE(host::Eventually(std::chrono::seconds(5), [&] { return status(invented) == 401; }))
-        << "all processes are taken, and it needs none";
-    EXPECT_EQ(status(std::string(64, 'a') + "; other=" + invented), 401);
+    // Each more than once: the connection before may still be there, and the host waits for one request alone.
+    for (const std::string& cookie : {invented, std::string(64, 'a') + "; other=" + invented}) {
+        EXPECT_TRUE(host::Eventually(std::chrono::seconds(5), [&] { return status(cookie) == 401; }))
+            << "all processes are taken, and it needs none";
+    }
     EXPECT_EQ(status(real), 503);
     EXPECT_EQ(status("z; id=" + real), 503) << "any of the cookies may be it";
 }
