@@ -3,13 +3,14 @@
 // Starts the web client. Where things are:
 //
 //   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
-//              groups, emap_setup, accounts, mounts, audit), the parts of an endless answer (multipart), files that are
+//              groups, emap_setup, devices, accounts, mounts, system, audit), the parts of an endless answer (multipart), files that are
 //              sent (upload), requests that end in time (deadline) and take turns (semaphore)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
-//   playback/  recordings: what is known of them (footage_cache, recorded_days); a player plays one, sync_playback those of
-//              several cameras at the same time
+//   playback/  recordings: what is known of them (footage_cache, footage_lookup, recorded_days); a player plays one,
+//              sync_playback those of several cameras (tracks) by one playback_clock; scrub_stills are the pictures of a
+//              playhead that is dragged
 //   ui/        app goes from screen to screen
 //     screens/    what fills the window: log-in, first account (setup), wall, events, maps, settings; what they have in common
 //                 (screen), and their addresses (route)
@@ -18,8 +19,8 @@
 //     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     settings/   the sections of the settings: cameras and their groups, maps, accounts, storage, audit. Most have a list
-//                 and a page of one record (record_page), whose form (record_form) notices what others have changed
+//     settings/   the sections of the settings: cameras and their groups, maps and devices, accounts, storage, system,
+//                 audit. Most have a list and a page of one record (record_page), whose form (record_form) notices what others have changed
 //                 meanwhile (merge, conflict_panel)
 //     widgets/    what all of these use: elements, buttons, icons, fields, credentials, dialogs, texts, titles, notices, keys,
 //                 panning and zooming

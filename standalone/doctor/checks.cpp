@@ -13,14 +13,14 @@ std::span<const Check> Checks() {
                                         {"store", CheckStore},
                                         {"cameras", CheckCameras},
                                         {"mounts", CheckMounts},
-                                        {"host", CheckHost},
+                                        {"web API", CheckHost},
                                         {"web server", CheckWebServer},
                                         {"certificate", CheckCertificate},
                                         {"recorder", CheckRecorder},
                                         {"active recorder", CheckActiveRecorder},
                                         {"recordings", CheckRecordings},
                                         {"maintenance", CheckMaintenance},
-                                        {"segments", CheckSegments},
+                                        {"shared memory", CheckSegments},
                                         {"paired hosts", CheckPairedHosts}};
     return kChecks;
 }

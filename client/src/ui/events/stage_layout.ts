@@ -20,11 +20,6 @@ export function layoutFor(cameras: number): StageLayout {
   return kStageLayouts.find((side) => side * side >= cameras) ?? 3;
 }
 
-/** The layouts that so many players fill, the last perhaps not quite. */
-export function largestLayout(maxPlayers: number): StageLayout {
-  return maxPlayers >= 9 ? 3 : maxPlayers >= 2 ? 2 : 1;
-}
-
 /** The plan with these cells, cut or filled up with empty ones, of which at most `maxPlayers` have a camera. */
 export function planOf(layout: StageLayout, cells: Cells, maxPlayers: number): StagePlan {
   const taken = new Set<number>();

@@ -22,7 +22,7 @@ export class StagePicker {
     this.#buttons = kStageLayouts.map((layout) => [layout, iconButton(...kLabels[layout], () => chosen(layout))] as const);
     for (const [layout, button] of this.#buttons) {
       button.disabled = layout > 1 && maxPlayers <= (layout - 1) ** 2;
-      if (button.disabled) button.title = `This connection plays no more than ${maxPlayers} at once; HTTPS plays more`;
+      if (button.disabled) button.title = `No more than ${maxPlayers} recordings play at once here`;
       this.root.append(button);
     }
   }

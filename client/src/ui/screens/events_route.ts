@@ -16,7 +16,7 @@ import type { ListChoice } from "../events/event_filter";
 import { kStageLayouts, type StagePlan } from "../events/stage_layout";
 import { recordAddress } from "./route";
 
-export interface EventsPlace {
+export interface EventsAddress {
   /** Null where nothing was recorded, or nothing plays. */
   footage: FootageRef | null;
   atMs: number | null;
@@ -28,7 +28,7 @@ const kKinds = ["event", "alert", "pos"] as const;
 const kIds = /^\d+(,\d+)*$/;
 
 /** Null for an address of another screen. */
-export function parsePlace(hash: string): EventsPlace | null {
+export function parsePlace(hash: string): EventsAddress | null {
   const said = new URLSearchParams(hash.replace(/^#/, ""));
   const number = (name: string) => (/^\d{1,15}$/.test(said.get(name) ?? "") ? Number(said.get(name)) : null);
   const ids = (name: string) => (kIds.test(said.get(name) ?? "") ? said.get(name)!.split(",").map(Number) : null);
@@ -51,7 +51,7 @@ export function parsePlace(hash: string): EventsPlace | null {
   };
 }
 
-export function formatPlace({ footage, atMs, stage, filter }: EventsPlace): string {
+export function formatPlace({ footage, atMs, stage, filter }: EventsAddress): string {
   const parts = [footage ? `#${footage.kind}=${footage.id}` : "#events"];
   // Not rounded down, which would lead to the frame before.
   if (atMs !== null) parts.push(`at=${Math.ceil(atMs)}`);
@@ -71,7 +71,7 @@ function moreOf({ kinds, isKeptOnly, words }: ListChoice): string[] {
  * Writes what is shown into the address: as an entry of its own in the history, to which Back leads, or in place of the
  * one before, which it does once in the interval: call it again until the address has it.
  */
-export function recordPlace(place: EventsPlace, isNewEntry: boolean, intervalMs: number): void {
+export function recordPlace(place: EventsAddress, isNewEntry: boolean, intervalMs: number): void {
   const before = parsePlace(location.hash);
   const isFirst = before !== null && before.footage === null && before.atMs === null;
   recordAddress(formatPlace(place), isNewEntry || isFirst, intervalMs);

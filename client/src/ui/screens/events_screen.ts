@@ -27,7 +27,7 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { OncePerFrame } from "../widgets/once_per_frame";
 import { spanInWords } from "../widgets/text";
-import { parsePlace, recordPlace, type EventsPlace } from "./events_route";
+import { parsePlace, recordPlace, type EventsAddress } from "./events_route";
 import { keepTrying } from "./keep_trying";
 import { showCamera } from "./route";
 import { Screen } from "./screen";
@@ -196,7 +196,7 @@ export class EventsScreen extends Screen {
     }
   }
 
-  async #openPlace({ footage: wanted, atMs, stage, filter }: EventsPlace, isWanted: () => boolean): Promise<void> {
+  async #openPlace({ footage: wanted, atMs, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
     if (filter) this.#overview.follow(filter);
     if (stage) this.#stage.show(stage.plan, stage.large);
     // Back from what is being played ends it.

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 
-import { formatPlace, parsePlace, type EventsPlace } from "../../../../client/src/ui/screens/events_route";
+import { formatPlace, parsePlace, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
 
 describe("an address of the events' screen", () => {
   const all = ["continuous", "alarm", "alert", "pos"] as const;
-  const nothing: EventsPlace = { footage: null, atMs: null, stage: null, filter: null };
+  const nothing: EventsAddress = { footage: null, atMs: null, stage: null, filter: null };
 
-  test.each<[string, EventsPlace]>([
+  test.each<[string, EventsAddress]>([
     ["#events", nothing],
     ["#alert=8", { ...nothing, footage: { kind: "alert", id: 8 } }],
     ["#events&at=1764183438123&layout=1&cameras=5", { ...nothing, atMs: 1764183438123, stage: { plan: { layout: 1, cells: [5] }, large: null } }],

@@ -86,6 +86,7 @@ test.each([
   ["remount it, as root: mount -o remount,rw /srv; where that fails, see dmesg", null],
   ["mount -o remount,rw /srv; where that fails, see dmesg", "mount -o remount,rw /srv"],
   ["lookhaven event list --kept, then lookhaven event release", "lookhaven event list --kept"],
+  ["as root: chmod go= '/srv/a, b'; then start again", "chmod go= '/srv/a, b'"],
   ["mount its disk", null],
   ["free space on its disk, or lower its limit with lookhaven mount set", null],
 ])("the command of the remedy %s is %s", (remedy, command) => expect(commandOf(remedy)).toBe(command));
@@ -100,8 +101,8 @@ test("what is wrong comes first, and what nobody looked at is not well", () => {
     { name: "certificate", ok: true, finding: [note], unchecked: null },
     { name: "mounts", ok: false, finding: [note, fault, fault], unchecked: null },
   ]);
-  expect(lines.map(({ kind, part }) => `${kind} ${part}`)).toEqual(
+  expect(lines.map(({ kind, check }) => `${kind} ${check}`)).toEqual(
     ["fault mounts", "fault mounts", "note certificate", "note mounts", "unchecked store"]);
-  expect(summaryText(lines)).toBe("2 problems, 2 notes, 1 part not checked");
+  expect(summaryText(lines)).toBe("2 problems, 2 notes, 1 check not done");
   expect(summaryText(linesOf([well]))).toBe("All is well.");
 });

@@ -55,9 +55,9 @@ function content(status: SystemStatus): HTMLElement[] {
   ];
 }
 
-function lineRow({ kind, part, text, remedy }: Line): HTMLElement {
+function lineRow({ kind, check, text, remedy }: Line): HTMLElement {
   const mark = element("strong", { class: `health-mark ${kind}` }, kKindNames[kind]);
-  const head = element("p", {}, mark, ` ${part}: ${text}`);
+  const head = element("p", {}, mark, ` ${check}: ${text}`);
   if (!remedy) return element("li", { class: "health-line" }, head);
   const command = commandOf(remedy);
   const advice = command === remedy ? [] : [element("p", { class: "health-remedy" }, `To do: ${remedy}`)];
@@ -80,7 +80,7 @@ function certificateContent(certificate: Certificate | null): HTMLElement[] {
   ];
 }
 
-export function factList(facts: readonly (readonly [label: string, text: string])[]): HTMLElement {
+function factList(facts: readonly (readonly [label: string, text: string])[]): HTMLElement {
   const fact = ([label, text]: readonly [string, string]) =>
     element("div", {}, element("dt", {}, label), element("dd", {}, text));
   return element("dl", { class: "mount-facts" }, ...facts.map(fact));

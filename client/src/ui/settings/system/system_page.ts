@@ -111,13 +111,13 @@ function descriptions({ settings }: Stored): Descriptions<Values> {
 }
 
 const kCommands: Record<string, string> = {
-  folders: "lookhaven setting set mount-folders /mnt:/media:/srv",
-  token: "lookhaven setting set monitor-token new",
+  mount_folders: "lookhaven setting set mount-folders /mnt:/media:/srv",
+  monitor_token: "lookhaven setting set monitor-token new",
 };
 
-function operatorsSetting({ name, kind, value, meaning }: SettingRecord): HTMLElement {
+function operatorsSetting({ name, value, meaning }: SettingRecord): HTMLElement {
   const text = typeof value === "boolean" ? (value ? "set" : "none") : String(value);
-  const command = kCommands[kind];
+  const command = kCommands[name];
   return element(
     "div",
     { class: "form-field" },

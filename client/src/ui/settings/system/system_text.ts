@@ -9,7 +9,7 @@ import { minuteText } from "../../widgets/text";
 export interface Line {
   kind: "fault" | "note" | "unchecked";
   /** "web server" */
-  part: string;
+  check: string;
   text: string;
   /** What to do; may be empty. */
   remedy: string;
@@ -21,8 +21,8 @@ export const kKindNames: Record<Line["kind"], string> = { fault: "Problem", note
 /** Faults, then notes, then what was not checked; within each in the order of the checks. */
 export function linesOf(checks: readonly Check[]): Line[] {
   const lines = checks.flatMap(({ name, finding, unchecked }): Line[] => [
-    ...finding.map(({ severity, problem, remedy }) => ({ kind: severity, part: name, text: problem, remedy })),
-    ...(unchecked ? [{ kind: "unchecked" as const, part: name, text: unchecked, remedy: "" }] : []),
+    ...finding.map(({ severity, problem, remedy }) => ({ kind: severity, check: name, text: problem, remedy })),
+    ...(unchecked ? [{ kind: "unchecked" as const, check: name, text: unchecked, remedy: "" }] : []),
   ]);
   return lines.sort((one, other) => kKinds.indexOf(one.kind) - kKinds.indexOf(other.kind));
 }
@@ -32,7 +32,7 @@ export function summaryText(lines: readonly Line[]): string {
   const counts = [
     [lines.filter(({ kind }) => kind === "fault").length, "problem"],
     [lines.filter(({ kind }) => kind === "note").length, "note"],
-    [lines.filter(({ kind }) => kind === "unchecked").length, "part not checked"],
+    [lines.filter(({ kind }) => kind === "unchecked").length, "check not done"],
   ] as const;
   const told = counts.filter(([count]) => count > 0).map(([count, noun]) => countedText(count, noun));
   return told.length > 0 ? told.join(", ") : "All is well.";
@@ -45,7 +45,7 @@ function countedText(count: number, noun: string): string {
 
 /** The command that a remedy begins with, ready for a shell; null for a remedy that is none. */
 export function commandOf(remedy: Finding["remedy"]): string | null {
-  const found = /^(?:as root: )?((?:(?:lookhaven|chmod|chown|ipcrm|systemctl) |mount -).*?)(?:[,;] .*)?$/.exec(remedy);
+  const found = /^(?:as root: )?((?:(?:lookhaven|chmod|chown|ipcrm|systemctl) |mount -)(?:'[^']*'|[^'])*?)(?:[,;] .*)?$/.exec(remedy);
   return found?.[1] ?? null;
 }
 
