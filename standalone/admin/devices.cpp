@@ -12,6 +12,8 @@ using store::Device;
 using store::Devices;
 using store::EmapItemType;
 
+constexpr std::size_t kMaxDevices = 500;  // of a kind
+
 std::string KindName(EmapItemType kind) {
     return base::NameOf(store::DeviceKindNames(), kind);
 }
@@ -48,6 +50,9 @@ Json::Value DeviceRecord(const Device& device) {
 Device AddDevice(store::Store& store, const Actor& actor, const Device& device) {
     Device added;
     Apply(store, actor, [&] {
+        if (Devices(store).List(device.kind).size() >= kMaxDevices) {
+            throw store::InvalidRecord("there are at most " + std::to_string(kMaxDevices) + " devices of a kind");
+        }
         added = RequireDevice(store, device.kind, Devices(store).Add(device));
         return Change{KindName(added.kind) + ".add", Named(added.name, added.id), {}, DeviceRecord(added)};
     });

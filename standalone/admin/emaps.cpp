@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/admin/emaps.h"
 
+#include <set>
+
 #include "standalone/admin/change.h"
 #include "standalone/emap/item_json.h"
 #include "standalone/emap/pictures.h"
@@ -15,7 +17,7 @@ using store::Emaps;
 constexpr std::size_t kMaxEmaps = 500;
 
 // A picture's file, written before its change begins since a disk may be slow while the store is locked. Goes with this
-// object unless a map has it.
+// object unless it is kept, or a map has it all the same.
 class NewPicture {
   public:
     NewPicture(store::Store& store, const std::filesystem::path& home, const emap::MapPicture& picture)
@@ -25,7 +27,9 @@ class NewPicture {
     NewPicture& operator=(const NewPicture&) = delete;
     ~NewPicture() {
         try {
-            pictures_.Withdraw(name_);
+            if (!is_kept_) {
+                pictures_.Withdraw(name_);
+            }
         } catch (const std::exception&) {
             // The next Sweep finds it.
         }
@@ -33,14 +37,28 @@ class NewPicture {
 
     const std::string& Name() const { return name_; }
 
+    // Once a map has it instead of the other picture, which may be empty.
+    void Keep(const std::string& replaced) {
+        is_kept_ = true;
+        pictures_.Retire(replaced);
+    }
+
   private:
     emap::Pictures pictures_;
     const std::string name_;
+    bool is_kept_ = false;
 };
 
-Json::Value RecordWithItems(store::Store& store, int id) {
-    Json::Value record = EmapRecord(RequireEmap(store, id));
-    record["items"] = emap::ToJson(Emaps(store).Items(id));
+// The map, with those of its items that are not among the others.
+Json::Value RecordOfPlaces(const Emap& emap, const Json::Value& items, const Json::Value& others) {
+    const std::set<Json::Value> known(others.begin(), others.end());
+    Json::Value record = EmapRecord(emap);
+    record["items"] = Json::arrayValue;
+    for (const Json::Value& item : items) {
+        if (!known.contains(item)) {
+            record["items"].append(item);
+        }
+    }
     return record;
 }
 
@@ -81,6 +99,7 @@ Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
         emap = RequireEmap(store, id);
         return Change{"emap.add", Named(emap.name, id), {}, EmapRecord(emap)};
     });
+    picture.Keep("");
     return emap;
 }
 
@@ -108,7 +127,7 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
         return Change{"emap.set", Named(emap.name, id), EmapRecord(before), EmapRecord(emap)};
     });
     if (picture) {
-        emap::Pictures(store, home).Retire(before.image);
+        picture->Keep(before.image);
     }
     return emap;
 }
@@ -116,9 +135,12 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
 int PlaceItems(store::Store& store, const Actor& actor, const Emap& emap, const std::vector<store::EmapItem>& items) {
     int revision = 0;
     Apply(store, actor, [&] {
-        const Json::Value before = RecordWithItems(store, emap.id);
+        const Emap before = RequireEmap(store, emap.id);
+        const Json::Value old_items = emap::ToJson(Emaps(store).Items(emap.id));
         revision = Emaps(store).ReplaceItems(emap, items);
-        return Change{"emap.place", Named(before["name"].asString(), emap.id), before, RecordWithItems(store, emap.id)};
+        const Json::Value new_items = emap::ToJson(Emaps(store).Items(emap.id));
+        return Change{"emap.place", Named(before.name, emap.id), RecordOfPlaces(before, old_items, new_items),
+                      RecordOfPlaces(RequireEmap(store, emap.id), new_items, old_items)};
     });
     return revision;
 }

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <string_view>
 
 #include "standalone/admin/change.h"
 #include "standalone/store/marks.h"
@@ -15,8 +16,11 @@ namespace {
 
 using Kind = Setting::Kind;
 
+// Clients go there with what they log in with, so it takes more than a manager's session to change it.
+constexpr std::string_view kLoginPort = "login_port";
+
 constexpr std::array kSettings = {
-    Setting{"login_port", Kind::kNumber, 8080, 1, 65535, "the port that clients are given for a direct log-in"},
+    Setting{kLoginPort.data(), Kind::kNumber, 8080, 1, 65535, "the port that clients are given for a direct log-in"},
     Setting{"players_per_session", Kind::kNumber, 9, 1, 16, "recorded events that one session may play side by side"},
     Setting{"marks_per_day", Kind::kNumber, store::kMarksPerDay, 1, 1'000'000,
             "alerts and POS transactions that one account may report within 24 hours"},
@@ -43,7 +47,7 @@ const char* NameOf(Kind kind) {
 }
 
 bool IsOperators(const Setting& setting) {
-    return setting.kind == Kind::kFolders || setting.kind == Kind::kToken;
+    return setting.kind == Kind::kFolders || setting.kind == Kind::kToken || setting.name == kLoginPort;
 }
 
 Json::Value ValueOf(store::Store& store, const Setting& setting) {

@@ -31,6 +31,7 @@ namespace {
 
 constexpr std::int64_t kMaxAuditEntries = 200;
 constexpr int kMonitorUserId = -1;  // all monitors together
+constexpr int kStatusUserId = -2;   // all who look at the state
 constexpr const char* kNoMonitor =
     "monitors must run on this machine or send the token of lookhaven setting set monitor-token";
 
@@ -133,7 +134,12 @@ std::string Audit(const Call& call) {
 }
 
 std::string Status(const Call& call) {
+    constexpr std::size_t kMaxAtOnce = 2;  // each has a process for each check
     admin::RequireManager(call.Records(), call.Actor());
+    if (call.slots.Admit(call.slot, kStatusUserId, kMaxAtOnce, std::numeric_limits<std::size_t>::max()) !=
+        control::Admission::kGranted) {
+        throw Failure(503, "others are looking at the state just now", http::kRetrySoonSeconds);
+    }
     return SuccessAnswer(SystemStatus(call));
 }
 

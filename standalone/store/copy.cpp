@@ -181,12 +181,15 @@ void RequireUnused(Store& store) {
     }
 }
 
+// By their text alone: to ask SQLite what a table is would run what shall be refused.
 void RequireTablesOnly(const std::string& url) {
     const std::set<std::string> own = OwnStatements();
     for (const std::string& statement :
          Connection(StoreAddress::Parse(url))
-             .FetchAll<std::string>("select lower(sql) from sqlite_master where type not in ('table', 'index')"
-                                    " or name in (select name from pragma_table_list where type = 'virtual')")) {
+             .FetchAll<std::string>("select lower(sql) from sqlite_master where sql <> ''"
+                                    " and not (type = 'table' and lower(sql) like 'create table %')"
+                                    " and not (type = 'index' and lower(sql) like 'create index %')"
+                                    " and not (type = 'index' and lower(sql) like 'create unique index %')")) {
         if (!own.contains(statement)) {
             throw InvalidRecord("the records hold views, triggers or virtual tables that are none of Lookhaven's own");
         }

@@ -60,7 +60,7 @@ TEST_F(SystemApi, ManagersAreToldOfEachPartAndWhatToDo) {
     const Json::Value before = Status();
     EXPECT_EQ(CheckOf(before, "mounts")["ok"], false);
     EXPECT_EQ(CheckOf(before, "mounts")["finding"][0]["remedy"], "lookhaven init");
-    EXPECT_EQ(CheckOf(before, "host")["ok"], true);
+    EXPECT_EQ(CheckOf(before, "web API")["ok"], true);
     EXPECT_EQ(CheckOf(before, "store")["ok"], true) << CheckOf(before, "store");
     EXPECT_EQ(CheckOf(before, "paired hosts")["ok"], true);
     for (const Json::Value& check : before["check"]) {

@@ -110,7 +110,10 @@ export class EventFilter {
   /** Adds a camera of which something is to be played. */
   include(camera: number): void {
     if (this.#chosen.has(camera) || !this.#cameras.some(({ id }) => id === camera)) return;
-    this.#choose([...this.#chosen, camera]);
+    this.#chosen = new Set([...this.#chosen, camera].slice(0, kMaxCameras));
+    this.#showCameras();
+    // Not stored: it may be a link's.
+    this.#changed();
   }
 
   #choose(cameras: readonly number[]): void {

@@ -38,13 +38,14 @@ export function parsePlace(hash: string): EventsAddress | null {
   const cells = ids("cameras")?.map((camera) => camera || null);
   const listed = ids("filter");
   const kinds = said.get("kinds")?.split(",") ?? kEventKinds;
+  const known = kEventKinds.filter((one) => kinds.includes(one));
   return {
     footage: kind ? { kind, id: number(kind)! } : null,
     atMs: number("at"),
     stage: layout && cells ? { plan: { layout, cells }, large: number("large") } : null,
     filter: listed && {
       cameras: listed,
-      kinds: kEventKinds.filter((one) => kinds.includes(one)),
+      kinds: known.length > 0 ? known : kEventKinds,
       isKeptOnly: said.has("kept"),
       words: said.get("text")?.trim() ?? "",
     },

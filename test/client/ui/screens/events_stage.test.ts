@@ -86,7 +86,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       for (let press = 0; press < 15; press += 1) await page.keyboard.down("ArrowRight");
     }
     await vi.waitFor(() => expect(archive.stills.length).toBeGreaterThan(2));
-    expect(archive.streams, "nothing plays meanwhile").toEqual([]);
+    await vi.waitFor(() => expect(archive.streams, "nothing plays meanwhile").toEqual([]));
     await vi.waitFor(async () => expect((await captions(page))[0]).not.toBe(before));
     archive.asked.length = 0;
     const shown = await page.locator(".timeline-lanes").getAttribute("aria-valuenow");

@@ -111,6 +111,7 @@ function descriptions({ settings }: Stored): Descriptions<Values> {
 }
 
 const kCommands: Record<string, string> = {
+  login_port: "lookhaven setting set login_port 8080",
   mount_folders: "lookhaven setting set mount-folders /mnt:/media:/srv",
   monitor_token: "lookhaven setting set monitor-token new",
 };
