@@ -47,9 +47,10 @@ Findings CheckSpace(store::Store& store, const store::Mount& mount, const mainte
         findings.push_back(
             {Concat("kept recordings alone take ", FormatSize(kept), " of ", TitleOf(mount), ", whose limit is ",
                     FormatSize(mount.max_bytes), ": whatever else is recorded is deleted at once"),
-             Concat("release kept recordings, which lookhaven event list --kept lists, with lookhaven event release, or "
-                    "raise the limit: lookhaven mount set ",
-                    mount.id, " --limit")});
+             Concat(
+                 "release kept recordings, which lookhaven event list --kept lists, with lookhaven event release, or "
+                 "raise the limit: lookhaven mount set ",
+                 mount.id, " --limit")});
         return findings;
     }
     const std::int64_t held = store::Events(store).Content(mount.id).size_bytes;
