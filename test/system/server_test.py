@@ -198,7 +198,7 @@ class ServerTest(unittest.TestCase):
             self.assertIn("recorder ended", server.said())
 
     def test_however_often_a_part_ends_it_is_back_before_streams_give_up(self):
-        restart = re.search(r"^Restart\(\) \{.*?^\}", (ROOT / "script/server").read_text(), re.M | re.S)[0]
+        restart = re.search(r"^Restart\(\) \{.*?^\}", (ROOT / "script/lib/supervision").read_text(), re.M | re.S)[0]
         script = f"""declare -A pid started pause=([recorder]=0)
             kill() {{ :; }}
             Detach() {{ printf '%s ' "$2" >&2; sleep 0 & }}
