@@ -14,6 +14,8 @@ export class ShownFrame {
   #index = 0;
   #capturedMs = 0;
   #positionMs = 0;
+  /** Since the recording was opened; what comes first repeats nothing. */
+  #hasFrame = false;
 
   get index(): number {
     return this.#index;
@@ -32,12 +34,13 @@ export class ShownFrame {
   /** Nothing of a recording is shown yet, of which that time was asked for. */
   reset(atMs: number): void {
     this.#index = 0;
+    this.#hasFrame = false;
     this.#capturedMs = this.#positionMs = atMs;
   }
 
   /** The position at which a frame is to be shown that follows. */
   positionOf({ index, capturedMs }: RecordedFrame): number {
-    const isRepeated = capturedMs === this.#capturedMs && index > this.#index;
+    const isRepeated = this.#hasFrame && capturedMs === this.#capturedMs && index > this.#index;
     return isRepeated ? this.#positionMs + (index - this.#index) * kMaxFrameMs : capturedMs;
   }
 
@@ -45,5 +48,6 @@ export class ShownFrame {
     this.#positionMs = this.positionOf(frame);
     this.#capturedMs = frame.capturedMs;
     this.#index = frame.index;
+    this.#hasFrame = true;
   }
 }
