@@ -184,6 +184,7 @@ function limitOf({ held, shownMs, intervalMs, joinMs, isLeftBehind }: Member): n
   return shownMs === null ? joinMs : shownMs + intervalMs;
 }
 
-function patienceFor({ shownMs }: Member): number {
-  return shownMs === null ? kMaxOpeningMs : kMaxWaitMs;
+/** At the end of what is still being recorded, a fast stream's next frame comes only when it has been taken. */
+function patienceFor({ shownMs, intervalMs }: Member): number {
+  return shownMs === null ? kMaxOpeningMs : kMaxWaitMs + intervalMs;
 }

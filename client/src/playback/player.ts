@@ -213,6 +213,7 @@ export class Player {
   async #play(start: Start): Promise<void> {
     const signal = this.#begin();
     this.#opening = start;
+    this.#shown.begin("atMs" in start ? start.atMs : -Infinity);
     this.#stills.forget();
     this.#become({ kind: "opening" });
     const first = await this.#locate(start, signal);

@@ -14,8 +14,8 @@ export class ShownFrame {
   #index = 0;
   #capturedMs = 0;
   #positionMs = 0;
-  /** Since the recording was opened; what comes first repeats nothing. */
-  #hasFrame = false;
+  /** Of the first frame of a run, which repeats nothing: when at the earliest it is due; null once it is shown. */
+  #dueFromMs: number | null = null;
 
   get index(): number {
     return this.#index;
@@ -34,13 +34,19 @@ export class ShownFrame {
   /** Nothing of a recording is shown yet, of which that time was asked for. */
   reset(atMs: number): void {
     this.#index = 0;
-    this.#hasFrame = false;
+    this.#dueFromMs = -Infinity;
     this.#capturedMs = this.#positionMs = atMs;
+  }
+
+  /** A stream begins at that time; a slow camera's first picture may have been taken long before. */
+  begin(atMs: number): void {
+    this.#dueFromMs = atMs;
   }
 
   /** The position at which a frame is to be shown that follows. */
   positionOf({ index, capturedMs }: RecordedFrame): number {
-    const isRepeated = this.#hasFrame && capturedMs === this.#capturedMs && index > this.#index;
+    if (this.#dueFromMs !== null) return Math.max(capturedMs, this.#dueFromMs);
+    const isRepeated = capturedMs === this.#capturedMs && index > this.#index;
     return isRepeated ? this.#positionMs + (index - this.#index) * kMaxFrameMs : capturedMs;
   }
 
@@ -48,6 +54,6 @@ export class ShownFrame {
     this.#positionMs = this.positionOf(frame);
     this.#capturedMs = frame.capturedMs;
     this.#index = frame.index;
-    this.#hasFrame = true;
+    this.#dueFromMs = null;
   }
 }

@@ -111,8 +111,10 @@ export class SyncPlayback {
 
   /** The playhead is dragged: it moves, and nothing plays until `seek` or `open`. */
   scrub(atMs: number): void {
-    if (!this.#isScrubbed) this.pause();
+    const isFirst = !this.#isScrubbed;
+    // First, so that no camera is brought to where the pause is.
     this.#isScrubbed = true;
+    if (isFirst) this.pause();
     this.#playheadMs = atMs;
     this.#changed();
   }
@@ -147,7 +149,7 @@ export class SyncPlayback {
     const before = this.rate;
     this.#tracks.setRate(rate);
     // What is on its way to the players leaves out frames that a slower rate shows.
-    if (this.#isPlaying && before > 1 && rate < before) this.seek(this.#tracks.clock.atMs);
+    if (this.#isPlaying && before > 1 && rate < before) this.#reopen(this.#tracks.clock.atMs);
     this.#changed();
   }
 
@@ -173,6 +175,13 @@ export class SyncPlayback {
     this.#goTo(0, false);
     this.#playheadMs = null;
     this.#tracks.close();
+  }
+
+  /** Of what is still being recorded, the cache does not know the end yet: what leads is opened again all the same. */
+  #reopen(atMs: number): void {
+    const { footage, state } = this.#lead?.player ?? {};
+    if (footage?.isGrowing && state?.kind === "playing") this.open(footage, atMs);
+    else this.seek(atMs);
   }
 
   #goTo(atMs: number, isPlaying: boolean): void {

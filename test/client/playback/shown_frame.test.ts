@@ -4,7 +4,7 @@
 
 import { ShownFrame } from "../../../client/src/playback/shown_frame";
 
-test("only a frame that was shown is repeated: the first one is at its own time, even where just that was asked for", () => {
+test("only a frame that was shown is repeated; the first is due at its own time, or at that which was asked for", () => {
   const shown = new ShownFrame();
   const positions = [
     { index: 40, capturedMs: 5000 },
@@ -21,4 +21,7 @@ test("only a frame that was shown is repeated: the first one is at its own time,
     shown.reset(askedMs);
     expect(play()).toEqual([5000, 6000, 8000, 8500]);
   }
+  // A picture that was taken long before the time that was asked for holds up no other camera.
+  shown.begin(7500);
+  expect(play()).toEqual([7500, 8500, 10500, 8500]);
 });
