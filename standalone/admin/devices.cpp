@@ -2,6 +2,8 @@
 #include "standalone/admin/devices.h"
 
 #include "standalone/admin/change.h"
+#include "standalone/store/cameras.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/value_names.h"
 
 namespace lookhaven::admin {
@@ -24,6 +26,21 @@ Device RequireDevice(store::Store& store, EmapItemType kind, int id) {
         throw store::NotFound("there is no " + store::DeviceKindText(kind) + " " + std::to_string(id));
     }
     return *std::move(device);
+}
+
+Json::Value PortsRecord(Devices& devices, int camera) {
+    const store::PortCounts counts = devices.CameraPorts()[camera];
+    Json::Value json;
+    json["id"] = camera;
+    json["inputs"] = counts.inputs;
+    json["outputs"] = counts.outputs;
+    return json;
+}
+
+// Of a camera that is known.
+std::string CameraName(store::Store& store, int id) {
+    const std::optional<store::Camera> camera = store::Cameras(store).Find(id);
+    return camera ? camera->name : store::RecordingServers(store).FindCamera(id).value().name;
 }
 
 }  // namespace
@@ -81,6 +98,15 @@ void RemoveDevice(store::Store& store, const Actor& actor, EmapItemType kind, in
         RequireCurrent(before, seen);
         Devices(store).Remove(kind, id);
         return Change{KindName(kind) + ".remove", Named(device.name, id), before, {}};
+    });
+}
+
+void SetCameraPorts(store::Store& store, const Actor& actor, int camera, store::PortCounts counts) {
+    Apply(store, actor, [&] {
+        Devices devices(store);
+        const Json::Value before = PortsRecord(devices, camera);
+        devices.SetCameraPorts(camera, counts);
+        return Change{"camera.ports", Named(CameraName(store, camera), camera), before, PortsRecord(devices, camera)};
     });
 }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Changes of doors, I/O modules and POS terminals.
+// Changes of doors, I/O modules and POS terminals, and of the ports of cameras.
 //
 // Failures      Each throws Forbidden, Stale, store::NotFound (for an unknown camera or server, too),
 //               store::InvalidRecord, store::AlreadyExists and store::StoreError; nothing was changed then.
@@ -30,5 +30,8 @@ store::Device SetDevice(store::Store& store, const Actor& actor, store::EmapItem
 // Its items stay on their maps, hidden, except a door's, which is shown without a state.
 void RemoveDevice(store::Store& store, const Actor& actor, store::EmapItemType kind, int id,
                   std::optional<std::int64_t> seen);
+
+// How many inputs and outputs a camera of this host or of a recording server has, which stand on e-maps.
+void SetCameraPorts(store::Store& store, const Actor& actor, int camera, store::PortCounts counts);
 
 }  // namespace lookhaven::admin

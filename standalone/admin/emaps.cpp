@@ -4,6 +4,7 @@
 #include <set>
 
 #include "standalone/admin/change.h"
+#include "standalone/base/log.h"
 #include "standalone/emap/item_json.h"
 #include "standalone/emap/pictures.h"
 
@@ -37,11 +38,7 @@ class NewPicture {
 
     const std::string& Name() const { return name_; }
 
-    // Once a map has it instead of the other picture, which may be empty.
-    void Keep(const std::string& replaced) {
-        is_kept_ = true;
-        pictures_.Retire(replaced);
-    }
+    void Keep() { is_kept_ = true; }  // a map has it
 
   private:
     emap::Pictures pictures_;
@@ -49,17 +46,25 @@ class NewPicture {
     bool is_kept_ = false;
 };
 
-// The map, with those of its items that are not among the others.
-Json::Value RecordOfPlaces(const Emap& emap, const Json::Value& items, const Json::Value& others) {
+// The change is made by now, and must not fail for what it leaves behind: the next one sweeps again.
+void Sweep(emap::Pictures& pictures) {
+    try {
+        pictures.Sweep();
+    } catch (const std::exception& error) {
+        base::LogWarning(std::string("pictures that no e-map has are left: ") + error.what());
+    }
+}
+
+// Those of the items that are not among the others.
+Json::Value Without(const Json::Value& items, const Json::Value& others) {
     const std::set<Json::Value> known(others.begin(), others.end());
-    Json::Value record = EmapRecord(emap);
-    record["items"] = Json::arrayValue;
+    Json::Value rest = Json::arrayValue;
     for (const Json::Value& item : items) {
         if (!known.contains(item)) {
-            record["items"].append(item);
+            rest.append(item);
         }
     }
-    return record;
+    return rest;
 }
 
 }  // namespace
@@ -99,21 +104,22 @@ Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
         emap = RequireEmap(store, id);
         return Change{"emap.add", Named(emap.name, id), {}, EmapRecord(emap)};
     });
-    picture.Keep("");
+    picture.Keep();
     return emap;
 }
 
 Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
              std::optional<std::int64_t> seen, const EmapChange& change) {
     RequireManager(store, actor);
-    Emap before;
     Emap emap;
+    emap::Pictures pictures(store, home);
     std::optional<NewPicture> picture;
     if (change.picture) {
         picture.emplace(store, home, *change.picture);
+        pictures.Touch(RequireEmap(store, id).image);
     }
     Apply(store, actor, [&] {
-        before = RequireEmap(store, id);
+        const Emap before = RequireEmap(store, id);
         RequireCurrent(EmapRecord(before), seen);
         emap = before;
         emap.name = change.name.value_or(before.name);
@@ -127,33 +133,45 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
         return Change{"emap.set", Named(emap.name, id), EmapRecord(before), EmapRecord(emap)};
     });
     if (picture) {
-        picture->Keep(before.image);
+        picture->Keep();
+        Sweep(pictures);
     }
     return emap;
 }
 
 int PlaceItems(store::Store& store, const Actor& actor, const Emap& emap, const std::vector<store::EmapItem>& items) {
-    int revision = 0;
+    Emap placed;
     Apply(store, actor, [&] {
         const Emap before = RequireEmap(store, emap.id);
         const Json::Value old_items = emap::ToJson(Emaps(store).Items(emap.id));
-        revision = Emaps(store).ReplaceItems(emap, items);
+        Emaps(store).ReplaceItems(emap, items);
+        placed = RequireEmap(store, emap.id);
         const Json::Value new_items = emap::ToJson(Emaps(store).Items(emap.id));
-        return Change{"emap.place", Named(before.name, emap.id), RecordOfPlaces(before, old_items, new_items),
-                      RecordOfPlaces(RequireEmap(store, emap.id), new_items, old_items)};
+        Change change{"emap.place", Named(before.name, emap.id), EmapRecord(before), EmapRecord(placed)};
+        change.before["items"] = Without(old_items, new_items);
+        change.after["items"] = Without(new_items, old_items);
+        // Another order, or one of two that are alike.
+        if (change.before["items"] == change.after["items"] && old_items != new_items) {
+            change.before["items"] = old_items;
+            change.after["items"] = new_items;
+        }
+        return change;
     });
-    return revision;
+    return placed.revision;
 }
 
 void RemoveEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
                 std::optional<std::int64_t> seen) {
+    RequireManager(store, actor);
+    emap::Pictures pictures(store, home);
+    pictures.Touch(RequireEmap(store, id).image);
     Apply(store, actor, [&] {
         const Emap emap = RequireEmap(store, id);
         RequireCurrent(EmapRecord(emap), seen);
         Emaps(store).Remove(id);
         return Change{"emap.remove", Named(emap.name, id), EmapRecord(emap), {}};
     });
-    emap::Pictures(store, home).Sweep();
+    Sweep(pictures);
 }
 
 }  // namespace lookhaven::admin

@@ -1,10 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/admin/groups.h"
 
-#include <algorithm>
-
 #include "standalone/admin/change.h"
-#include "standalone/store/users.h"
 
 namespace lookhaven::admin {
 
@@ -21,19 +18,6 @@ CameraGroup RequireGroup(Groups& groups, int id) {
     return *std::move(group);
 }
 
-// Of the accounts to which something of the group is denied.
-std::vector<std::string> DeniedTo(store::Store& store, int group) {
-    store::Users users(store);
-    std::vector<std::string> names;
-    for (const store::User& user : users.List()) {
-        const store::Denials denials = users.FindDenials(user.id);
-        if (std::ranges::any_of(denials.groups, [group](const auto& kind) { return kind.second.contains(group); })) {
-            names.push_back(user.name);
-        }
-    }
-    return names;
-}
-
 }  // namespace
 
 Json::Value GroupRecord(store::Store& store, const CameraGroup& group) {
@@ -45,7 +29,7 @@ Json::Value GroupRecord(store::Store& store, const CameraGroup& group) {
         json["camera"].append(camera);
     }
     json["deniedTo"] = Json::arrayValue;
-    for (const std::string& account : DeniedTo(store, group.id)) {
+    for (const std::string& account : Groups(store).DeniedTo(group.id)) {
         json["deniedTo"].append(account);
     }
     json["revision"] = Json::Int64{RevisionOf(json)};

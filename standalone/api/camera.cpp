@@ -10,6 +10,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/camera_page.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/named_list.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/probe.h"

@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "standalone/api/fields.h"
 #include "standalone/base/codec_words.h"
 #include "standalone/base/text.h"
 #include "standalone/media/source_kinds.h"
@@ -18,59 +19,18 @@ namespace {
 using store::CameraProfile;
 using store::RecordingPlan;
 
-[[noreturn]] void Refuse(const std::string& name, const std::string& what) {
-    throw Failure(400, name + " must be " + what);
-}
-
-void Take(const Json::Value& value, const std::string& name, bool& target) {
-    if (!value.isNull() && !value.isBool()) {
-        Refuse(name, "true or false");
-    }
-    target = value.isNull() ? target : value.asBool();
-}
-
-void Take(const Json::Value& value, const std::string& name, int& target) {
-    if (!value.isNull() && !value.isInt()) {
-        Refuse(name, "a whole number");
-    }
-    target = value.isNull() ? target : value.asInt();
-}
-
-void Take(const Json::Value& value, const std::string& name, std::string& target) {
-    if (!value.isNull() && !value.isString()) {
-        Refuse(name, "a text");
-    }
-    target = value.isNull() ? target : value.asString();
-}
-
-template <typename Value>
-void TakeNamed(const Json::Value& value, const std::string& name, const base::Names<Value>& names, Value& target) {
-    if (value.isNull()) {
-        return;
-    }
-    const auto found = value.isString() ? names.find(value.asString()) : names.end();
-    if (found == names.end()) {
-        std::string list;
-        for (const auto& [each, meaning] : names) {
-            list += (list.empty() ? "" : ", ") + each;
-        }
-        Refuse(name, "one of " + list);
-    }
-    target = found->second;
-}
-
 // A profile keeps what the list does not say of it.
 void TakeSources(const Json::Value& list, store::Camera& camera) {
     if (list.isNull()) {
         return;
     }
     if (!list.isArray()) {
-        Refuse("source", "a list");
+        RefuseField("source", "a list");
     }
     std::vector<CameraProfile> profiles;
     for (const Json::Value& source : list) {
         if (!source.isObject()) {
-            Refuse("source", "a list of objects");
+            RefuseField("source", "a list of objects");
         }
         int number = 0;
         Take(source["profile"], "source.profile", number);
@@ -91,7 +51,7 @@ void TakePlan(const Json::Value& json, std::optional<RecordingPlan>& stored) {
         return;
     }
     if (!json.isObject()) {
-        Refuse("plan", "an object");
+        RefuseField("plan", "an object");
     }
     RecordingPlan plan = stored.value_or(RecordingPlan());
     TakeNamed(json["mode"], "plan.mode", store::RecordModeNames(), plan.mode);
@@ -109,7 +69,7 @@ void TakeGroups(const Json::Value& list, std::set<int>& groups) {
         return;
     }
     if (!list.isArray()) {
-        Refuse("group", "a list");
+        RefuseField("group", "a list");
     }
     groups.clear();
     for (const Json::Value& id : list) {
@@ -150,18 +110,6 @@ std::string LiveAddress(const store::Camera& camera) {
 }
 
 }  // namespace
-
-void TakeField(const Call& call, const char* name, bool& target) {
-    Take(call.Parameter(name), name, target);
-}
-
-void TakeField(const Call& call, const char* name, int& target) {
-    Take(call.Parameter(name), name, target);
-}
-
-void TakeField(const Call& call, const char* name, std::string& target) {
-    Take(call.Parameter(name), name, target);
-}
 
 std::optional<store::Credentials> TakeCredentials(const Call& call, const admin::CameraSetup& stored,
                                                   const std::vector<std::string>& addresses, bool insecure) {

@@ -11,11 +11,6 @@
 
 namespace lookhaven::api {
 
-// Each leaves target as it is where the parameter is missing. Throws Failure 400, which names it, for another type.
-void TakeField(const Call& call, const char* name, bool& target);
-void TakeField(const Call& call, const char* name, int& target);
-void TakeField(const Call& call, const char* name, std::string& target);
-
 // Changes in the setup what the call names. A stored password goes to no other server (scheme, host, port) than those
 // that the camera has, nor to one whose certificate is no longer verified: whoever may replace it may not read it.
 // Throws Failure 400.

@@ -4,7 +4,7 @@
 #include "standalone/api/own_apis.h"
 
 #include "standalone/admin/devices.h"
-#include "standalone/api/camera_fields.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/revision.h"
 #include "standalone/store/value_names.h"
 
@@ -15,32 +15,14 @@ namespace {
 using store::Device;
 using store::EmapItemType;
 
-// Throws Failure 400, which says what the parameter must be.
-template <typename Value>
-Value Named(const base::Names<Value>& names, const Json::Value& value, const char* sentence) {
-    const auto found = names.find(value.isString() ? value.asString() : "");
-    if (found == names.end()) {
-        throw Failure(400, sentence);
-    }
-    return found->second;
-}
-
 EmapItemType KindOf(const Call& call) {
-    return Named(store::DeviceKindNames(), call.Parameter("kind"), "kind must be door, io or pos");
-}
-
-int IdOf(const Call& call) {
-    int id = 0;
-    TakeField(call, "id", id);
-    return id;
-}
-
-int NumberIn(const Json::Value& port, const char* name) {
-    const Json::Value& value = port[name];
-    if (!value.isInt() && !value.isNull()) {
-        throw Failure(400, "a port's number and camera must be numbers");
+    const Json::Value& kind = call.Parameter("kind");
+    if (kind.isNull()) {
+        throw Failure(400, "kind is missing");
     }
-    return value.asInt();
+    EmapItemType type{};
+    TakeNamed(kind, "kind", store::DeviceKindNames(), type);
+    return type;
 }
 
 // What the call does not name stays.
@@ -59,10 +41,11 @@ void TakeDeviceFields(const Call& call, Device& device) {
         if (!port.isObject() || !port["port"].isInt()) {
             throw Failure(400, "each port must be an object with its number as port");
         }
-        const store::PortType type =
-            Named(store::PortTypeNames(), port["type"], "the type of a port must be in or out");
-        if (!device.ports.emplace(port["port"].asInt(), store::Port{type, NumberIn(port, "camera")}).second) {
-            throw Failure(400, "a port is named twice");
+        store::Port taken;
+        TakeNamed(port["type"], "port.type", store::PortTypeNames(), taken.type);
+        Take(port["camera"], "port.camera", taken.camera_id);
+        if (port["type"].isNull() || !device.ports.emplace(port["port"].asInt(), taken).second) {
+            throw Failure(400, "each port must be there once, with its type");
         }
     }
 }
@@ -95,13 +78,13 @@ std::string Add(const Call& call) {
 
 std::string Set(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    return AnswerRecord(admin::SetDevice(call.Records(), call.Actor(), KindOf(call), IdOf(call), seen,
+    return AnswerRecord(admin::SetDevice(call.Records(), call.Actor(), KindOf(call), IdIn(call, "id"), seen,
                                          [&call](Device& device) { TakeDeviceFields(call, device); }));
 }
 
 std::string Remove(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    admin::RemoveDevice(call.Records(), call.Actor(), KindOf(call), IdOf(call), seen);
+    admin::RemoveDevice(call.Records(), call.Actor(), KindOf(call), IdIn(call, "id"), seen);
     return SuccessAnswer(Json::objectValue);
 }
 

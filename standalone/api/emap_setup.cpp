@@ -7,6 +7,7 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/emaps.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/revision.h"
 #include "standalone/binding/common_record.h"
@@ -52,14 +53,6 @@ std::string AnswerRecord(const Call& call, const store::Emap& emap) {
     return SuccessAnswer(data);
 }
 
-int IdOf(const Call& call) {
-    const Json::Value& id = call.Parameter("emap");
-    if (!id.isInt64()) {
-        throw Failure(400, "emap must be a number");
-    }
-    return id.isInt() ? id.asInt() : 0;
-}
-
 std::string RequireName(const Call& call) {
     const Json::Value& name = call.Parameter("name");
     if (!name.isConvertibleTo(Json::stringValue) || name.isNull()) {
@@ -86,7 +79,7 @@ emap::MapPicture DrawnPicture(const Call& call) {
 std::string Change(const Call& call, std::int64_t seen, const admin::EmapChange& change) {
     return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
                             return admin::SetEmap(call.Records(), call.Actor(), call.context.Installation().Home(),
-                                                  IdOf(call), seen, change);
+                                                  IdIn(call, "emap"), seen, change);
                         }));
 }
 
@@ -119,7 +112,7 @@ std::string AddEmap(const Call& call) {
 std::string SetEmapPicture(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
     OnCurrentRecord(Completer(call), [&] {  // before the picture costs anything
-        admin::RequireCurrent(admin::EmapRecord(admin::RequireEmap(call.Records(), IdOf(call))), seen);
+        admin::RequireCurrent(admin::EmapRecord(admin::RequireEmap(call.Records(), IdIn(call, "emap"))), seen);
     });
     return Change(call, seen, {.picture = DrawnPicture(call)});
 }
@@ -131,7 +124,7 @@ std::string RenameEmap(const Call& call) {
 std::string RemoveEmap(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
     OnCurrentRecord(Completer(call), [&] {
-        admin::RemoveEmap(call.Records(), call.Actor(), call.context.Installation().Home(), IdOf(call), seen);
+        admin::RemoveEmap(call.Records(), call.Actor(), call.context.Installation().Home(), IdIn(call, "emap"), seen);
     });
     return SuccessAnswer(Json::objectValue);
 }

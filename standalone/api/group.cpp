@@ -5,7 +5,7 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/groups.h"
-#include "standalone/api/camera_fields.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/revision.h"
 
 namespace lookhaven::api {
@@ -16,14 +16,6 @@ std::string AnswerRecord(const Call& call, const store::CameraGroup& group) {
     Json::Value data;
     data["group"] = admin::GroupRecord(call.Records(), group);
     return SuccessAnswer(data);
-}
-
-int IdOf(const Call& call) {
-    const Json::Value& id = call.Parameter("id");
-    if (!id.isInt64()) {
-        throw Failure(400, "id must be a number");
-    }
-    return id.isInt() ? id.asInt() : 0;
 }
 
 // What the call does not name stays.
@@ -59,13 +51,13 @@ std::string Add(const Call& call) {
 
 std::string Set(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    return AnswerRecord(call, admin::SetGroup(call.Records(), call.Actor(), IdOf(call), seen,
+    return AnswerRecord(call, admin::SetGroup(call.Records(), call.Actor(), IdIn(call, "id"), seen,
                                               [&call](store::CameraGroup& group) { TakeGroupFields(call, group); }));
 }
 
 std::string Remove(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
-    admin::RemoveGroup(call.Records(), call.Actor(), IdOf(call), seen);
+    admin::RemoveGroup(call.Records(), call.Actor(), IdIn(call, "id"), seen);
     return SuccessAnswer(Json::objectValue);
 }
 

@@ -6,6 +6,7 @@
 #include "standalone/admin/camera_stream.h"
 #include "standalone/admin/cameras.h"
 #include "standalone/api/camera_fields.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/password_check.h"
 #include "standalone/api/still_picture.h"
 #include "standalone/base/codec_words.h"

@@ -5,6 +5,7 @@
 
 #include "standalone/admin/camera_stream.h"
 #include "standalone/admin/cameras.h"
+#include "standalone/admin/devices.h"
 #include "standalone/base/codec_words.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
@@ -208,7 +209,7 @@ void Plan(const Console& console, const Request& request) {
 void SetPorts(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const auto [inputs, outputs] = request.ports;
-    store::Devices(store).SetCameraPorts(request.id, request.ports);
+    admin::SetCameraPorts(store, {}, request.id, request.ports);
     console.Answer(Object("id", request.id, "inputs", inputs, "outputs", outputs), "Camera ", request.id, " has ",
                    inputs, " inputs and ", outputs, " outputs.");
 }

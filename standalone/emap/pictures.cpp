@@ -106,13 +106,11 @@ void Pictures::Withdraw(const std::string& name) {
     }
 }
 
-void Pictures::Retire(const std::string& name) {
-    // Who has read the map's row just now still looks for it: it grows old from here.
+void Pictures::Touch(const std::string& name) {
     if (IsPictureName(name)) {
         std::error_code ignored;
         fs::last_write_time(folder_ / name, fs::file_time_type::clock::now(), ignored);
     }
-    Sweep();
 }
 
 std::set<std::string> Pictures::Used() {

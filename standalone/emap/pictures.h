@@ -37,10 +37,10 @@ class Pictures {
     std::string Write(std::string_view bytes);
     // Removes what Write has just written unless a map has it by now.
     void Withdraw(const std::string& name);
-    // A map has another picture instead of this one, whose file goes a minute from now.
-    void Retire(const std::string& name);
+    // Before a map loses its picture: Sweep spares the file for a minute, for who has read the map's row just now.
+    void Touch(const std::string& name);
 
-    // Removes files that no map names, a minute after they were written: a map's removal leaves one behind.
+    // Removes files that no map names, a minute after they were written or touched.
     void Sweep();
 
     // The file's bytes. Throws std::system_error when there is none, also for a name that is none of ours.

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <set>
 #include <string_view>
 #include <utility>
 
@@ -99,9 +100,22 @@ void RequireAnyCamera(soci::session& sql, int id) {
     Require(FetchOne<int>(sql, query, id, id), "camera", id);
 }
 
-void RequirePairedCamera(soci::session& sql, int id) {
-    if (id != 0) {
-        RequireAnyCamera(sql, id);
+// All cameras that a device names.
+std::set<int> PairedCameras(const Device& device) {
+    std::set<int> cameras = {device.camera_id};
+    for (const auto& [index, port] : device.ports) {
+        cameras.insert(port.camera_id);
+    }
+    return cameras;
+}
+
+// before: the device as it was. What it named already may have been removed since.
+void RequirePairedCameras(soci::session& sql, const Device& device, const Device& before = {}) {
+    const std::set<int> known = PairedCameras(before);
+    for (const int camera : PairedCameras(device)) {
+        if (camera != 0 && !known.contains(camera)) {
+            RequireAnyCamera(sql, camera);
+        }
     }
 }
 
@@ -129,7 +143,6 @@ void RequireValid(const Device& device) {
 void ReplacePorts(soci::session& sql, const Device& device) {
     Execute(sql, "delete from device_ports where kind = :kind and device_id = :id", device.kind, device.id);
     for (const auto& [index, port] : device.ports) {
-        RequirePairedCamera(sql, port.camera_id);
         Insert(sql, PortRow(device.kind, device.id, index, port.type, port.camera_id));
     }
 }
@@ -170,7 +183,7 @@ int Devices::Add(const Device& device) {
                 throw AlreadyExists("this " + DeviceKindText(device.kind) + " of the server is known already");
             }
         }
-        RequirePairedCamera(sql, added.camera_id);
+        RequirePairedCameras(sql, added);
         Insert(sql, added);
         ReplacePorts(sql, added);
         RaiseRevision(sql);
@@ -181,12 +194,13 @@ int Devices::Add(const Device& device) {
 void Devices::Update(const Device& device) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        Device changed = RequireDevice(sql, device.kind, device.id);
+        const Device before = RequireDevice(sql, device.kind, device.id);
+        Device changed = before;
         changed.name = device.name;
         changed.camera_id = device.camera_id;
         changed.ports = device.ports;
         RequireValid(changed);
-        RequirePairedCamera(sql, changed.camera_id);
+        RequirePairedCameras(sql, changed, before);
         Execute(sql, "update devices set name = :name, camera_id = :camera where kind = :kind and id = :id",
                 changed.name, changed.camera_id, changed.kind, changed.id);
         ReplacePorts(sql, changed);

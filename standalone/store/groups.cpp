@@ -80,6 +80,12 @@ void Groups::Update(const CameraGroup& group) {
     });
 }
 
+std::vector<std::string> Groups::DeniedTo(int id) {
+    return connection_.FetchAll<std::string>(
+        "select name from users where id in (select user_id from denied_groups where group_id = :id) order by name",
+        id);
+}
+
 void Groups::Remove(int id) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);

@@ -35,6 +35,8 @@ class Groups {
 
     std::optional<CameraGroup> Find(int id);
     std::vector<CameraGroup> List();  // by id
+    // Names of the users to whom something of the group is denied, sorted.
+    std::vector<std::string> DeniedTo(int id);
 
   private:
     Connection& connection_;

@@ -4,7 +4,6 @@
 #include "standalone/admin/devices.h"
 
 #include "standalone/admin/change.h"
-#include "standalone/store/audit_log.h"
 #include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
@@ -20,13 +19,6 @@ using testing::HasSubstr;
 
 class DeviceAdminTest : public store::StoreTest {
   protected:
-    std::vector<std::string> Audited() {
-        std::vector<std::string> entries;
-        for (const store::AuditEntry& entry : store::AuditLog(store_).List(0, 9)) {
-            entries.push_back(entry.action + " " + entry.object + " " + entry.before + " " + entry.after);
-        }
-        return entries;
-    }
     static std::int64_t Revision(const Device& device) { return DeviceRecord(device)["revision"].asInt64(); }
 
     const Device module_{.kind = kIoModule, .name = "Box", .ports = {{0, {store::PortType::kInput, 1}}, {5, {}}}};
@@ -48,6 +40,13 @@ TEST_P(DeviceAdminTest, AreAuditedByTheirKind) {
         << "what changes nothing leaves no row";
     EXPECT_FALSE(store::Devices(store_).Find(kDoor, door.id));
     EXPECT_TRUE(store::Devices(store_).Find(kIoModule, box.id));
+    SetCameraPorts(store_, {}, 1, {.inputs = 2});
+    EXPECT_EQ(Audited().front(),
+              R"(camera.ports Gate (1) {"id":1,"inputs":0,"outputs":0} {"id":1,"inputs":2,"outputs":0})");
+    store::Cameras(store_).Remove(1);
+    EXPECT_THROW(SetCameraPorts(store_, {}, 1, {}), store::NotFound);
+    EXPECT_EQ(SetDevice(store_, {}, kIoModule, box.id, {}, [](Device& edited) { edited.name = "Case"; }).name, "Case")
+        << "a camera that was removed stays named";
 }
 
 TEST_P(DeviceAdminTest, AreRefusedWithoutATrace) {

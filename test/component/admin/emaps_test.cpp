@@ -5,7 +5,6 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/emap/pictures.h"
-#include "standalone/store/audit_log.h"
 #include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
@@ -21,13 +20,6 @@ using testing::HasSubstr;
 
 class EmapAdminTest : public store::StoreTest {
   protected:
-    std::vector<std::string> Audited() {
-        std::vector<std::string> entries;
-        for (const store::AuditEntry& entry : store::AuditLog(store_).List(0, 9)) {
-            entries.push_back(entry.action + " " + entry.object + " " + entry.before + entry.after);
-        }
-        return entries;
-    }
     EmapChange Named(const std::string& name) { return {.name = name, .picture = drawing_}; }
 
     const emap::MapPicture drawing_ = emap::MapPicture::OfOperator("<svg/>");
@@ -51,9 +43,27 @@ TEST_P(EmapAdminTest, AreAuditedWhoeverMakesThem) {
                 ElementsAre(HasSubstr("emap.remove Court (1) {"), HasSubstr("emap.place Court (1) {"),
                             HasSubstr("emap.set Court (1) {"),
                             HasSubstr(R"("name":"Yard","picture":")" + added.image + R"(","smallItemSize":false})"),
-                            HasSubstr("emap.add Yard (1) {")))
+                            HasSubstr("emap.add Yard (1)  {")))
         << "what changes nothing leaves no row";
     EXPECT_TRUE(emaps_.List().empty());
+}
+
+TEST_P(EmapAdminTest, WhatIsPlacedIsAuditedByWhatHasChanged) {
+    AddCamera();
+    const Emap map = AddEmap(store_, {}, folder_, Named("Yard"));
+    const store::EmapItem camera{.device_id = 1, .name = "Gate", .x = 10};
+    const store::EmapItem link{.type = store::EmapItemType::kEmap, .device_id = map.id, .name = "Here"};
+    const auto place = [&](const std::vector<store::EmapItem>& items) {
+        PlaceItems(store_, {}, *emaps_.Find(map.id), items);
+        return Audited().front();
+    };
+    EXPECT_THAT(place({camera, link}), testing::AllOf(HasSubstr(R"("items":[],)"), HasSubstr(R"("name":"Gate")")));
+    EXPECT_THAT(place({store::With(camera, &store::EmapItem::x, 20), link}),
+                testing::AllOf(HasSubstr(R"("x":10)"), HasSubstr(R"("x":20)"), testing::Not(HasSubstr("Here"))));
+    EXPECT_THAT(place({link, store::With(camera, &store::EmapItem::x, 20)}), HasSubstr(R"("Here")")) << "another order";
+    const std::size_t entries = Audited().size();
+    place({link, store::With(camera, &store::EmapItem::x, 20)});
+    EXPECT_EQ(Audited().size(), entries) << "nothing has changed";
 }
 
 TEST_P(EmapAdminTest, AreRefusedWithoutATrace) {

@@ -4,7 +4,6 @@
 #include "standalone/admin/groups.h"
 
 #include "standalone/admin/change.h"
-#include "standalone/store/audit_log.h"
 #include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
 
@@ -18,13 +17,6 @@ using testing::ElementsAre;
 
 class GroupAdminTest : public store::StoreTest {
   protected:
-    std::vector<std::string> Audited() {
-        std::vector<std::string> entries;
-        for (const store::AuditEntry& entry : store::AuditLog(store_).List(0, 9)) {
-            entries.push_back(entry.action + " " + entry.object + " " + entry.before + " " + entry.after);
-        }
-        return entries;
-    }
     std::int64_t Revision(int id) {
         return GroupRecord(store_, store::Groups(store_).Find(id).value())["revision"].asInt64();
     }

@@ -13,9 +13,9 @@ namespace {
 class PicturesTest : public store::StoreTest {
   protected:
     void Put(int map, const std::string& bytes) {
-        const std::string before = emaps_.Find(map)->image;
+        pictures_.Touch(emaps_.Find(map)->image);
         emaps_.SetImage(map, pictures_.Write(bytes));
-        pictures_.Retire(before);
+        pictures_.Sweep();
     }
 
     store::Emaps emaps_{store_};

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "test/component/store/store_fixture.h"
 
+#include "standalone/store/audit_log.h"
+
 #include <exception>
 #include <latch>
 
@@ -48,6 +50,14 @@ void EmptyStore::InParallel(int threads, const std::function<void()>& work) {
 
 std::string EngineName(const testing::TestParamInfo<Engine>& info) {
     return info.param == Engine::kSqlite ? "Sqlite" : "Postgresql";
+}
+
+std::vector<std::string> StoreTest::Audited() {
+    std::vector<std::string> entries;
+    for (const AuditEntry& entry : AuditLog(store_).List(0, 20)) {
+        entries.push_back(entry.action + " " + entry.object + " " + entry.before + " " + entry.after);
+    }
+    return entries;
 }
 
 }  // namespace lookhaven::store

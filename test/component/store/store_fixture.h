@@ -47,6 +47,9 @@ class StoreTest : public EmptyStore {
 
     int AddCamera() { return Cameras(store_).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}}); }
 
+    // The newest entries of the audit log, the last one first: action, object, and the record before and after.
+    std::vector<std::string> Audited();
+
     // The same on a connection each.
     void InParallel(int connections, const std::function<void(Store&)>& work) {
         EmptyStore::InParallel(connections, [&] {
