@@ -1,6 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
-"""LoadCamera with 100 cameras: answers a second and their times, at the socket and through nginx. Then how long a camera that
-is added over the web API takes to its first live picture."""
+"""LoadCamera with 100 cameras: answers a second and their times, at the socket and through nginx; asked by one client now
+and then, as people do, and by clients that ask again at once, who wait for the host to fork the next process. Then how long
+a camera that is added over the web API takes to its first live picture."""
 
 import json
 import pathlib
@@ -24,22 +25,22 @@ def print_answers(bin_folder):
         stand.start_host()
         stand.start_nginx()
         cookie = stand.log_in()
-        print("| server | clients | answers/s | p50 ms | p99 ms | refused |")
-        print("|---|---|---|---|---|---|")
+        print("| server | clients | pause ms | answers/s | p50 ms | p99 ms | refused |")
+        print("|---|---|---|---|---|---|---|")
         for name, target in (
             ("host, SCGI socket", ["--unix", stand.socket]),
             ("host behind nginx", ["--port", str(stand.port)]),
         ):
-            for clients in (1, 16):
+            for clients, pause_ms in (1, 50), (1, 0), (16, 0):
                 output = subprocess.run(
                     [bin_folder / "bench_requests", *target, "--cookie", cookie, "--query", QUERY]
-                    + ["--clients", str(clients), "--seconds", "5"],
+                    + ["--clients", str(clients), "--pause-ms", str(pause_ms), "--seconds", "5"],
                     check=True,
                     capture_output=True,
                 ).stdout
                 row = json.loads(output)
                 print(
-                    f"| {name} | {clients} | {row['per_second']:.0f} | {row['p50_micros'] / 1000:.2f} "
+                    f"| {name} | {clients} | {pause_ms} | {row['per_second']:.0f} | {row['p50_micros'] / 1000:.2f} "
                     f"| {row['p99_micros'] / 1000:.2f} | {row['refused']} |",
                     flush=True,
                 )

@@ -3,6 +3,7 @@
 // Asks one JSON question again and again from several clients and prints rate and times as one JSON object.
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <cstdint>
 #include <iostream>
 #include <stdexcept>
@@ -38,7 +39,7 @@ bool Ask(const bench::Target& target, const std::string& request) {
     }
 }
 
-Tally RunClient(const bench::Target& target, std::int64_t stop_micros) {
+Tally RunClient(const bench::Target& target, std::int64_t stop_micros, std::chrono::milliseconds pause) {
     Tally tally;
     const std::string request = bench::Request(target);
     for (std::int64_t start = MonotonicMicros(); start < stop_micros; start = MonotonicMicros()) {
@@ -47,6 +48,7 @@ Tally RunClient(const bench::Target& target, std::int64_t stop_micros) {
         } else {
             ++tally.refused;
         }
+        std::this_thread::sleep_for(pause);
     }
     return tally;
 }
@@ -55,6 +57,7 @@ int Run(int count, char** arguments) {
     bench::Target target;
     std::size_t clients = 1;
     double seconds = 5;
+    std::chrono::milliseconds pause{0};  // of each client between two requests
     for (int i = 1; i + 1 < count; i += 2) {
         const std::string name = arguments[i];
         const std::string value = arguments[i + 1];
@@ -62,6 +65,8 @@ int Run(int count, char** arguments) {
             clients = std::stoul(value);
         } else if (name == "--seconds") {
             seconds = std::stod(value);
+        } else if (name == "--pause-ms") {
+            pause = std::chrono::milliseconds(std::stol(value));
         } else if (!bench::TakeOption(target, name, value)) {
             throw std::invalid_argument("unknown option " + name);
         }
@@ -71,8 +76,8 @@ int Run(int count, char** arguments) {
     {
         std::vector<std::jthread> threads;
         for (Tally& tally : tallies) {
-            threads.emplace_back([&tally, &target, start, seconds] {
-                tally = RunClient(target, start + static_cast<std::int64_t>(seconds * 1e6));
+            threads.emplace_back([&tally, &target, start, seconds, pause] {
+                tally = RunClient(target, start + static_cast<std::int64_t>(seconds * 1e6), pause);
             });
         }
     }

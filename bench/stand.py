@@ -10,13 +10,18 @@ import subprocess
 import sys
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
-from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, wait_until
+from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, process_name, wait_until
 
 
 def cpu_nanos(pids):
     """Processor time that the threads of the processes have used so far; without those that have ended."""
     threads = (thread for pid in pids for thread in pathlib.Path(f"/proc/{pid}/task").iterdir())
     return sum(int((thread / "schedstat").read_text().split()[0]) for thread in threads)
+
+
+def busy(pids):
+    """Of the processes, those that do not wait for a request."""
+    return [pid for pid in pids if process_name(pid) != "webapi-spare"]
 
 
 def private_kib(pid):
@@ -113,7 +118,8 @@ class Stand(Installation):
     def start_host(self):
         module = self._bin.parent / "lib" / "VEXO.Lookhaven.Player.so"
         self._start(
-            "webapi", self._bin / "lookhaven-webapi", "--home", self.home, "--socket", self.socket, "--module", module
+            "webapi", "env", "LD_BIND_NOW=1", self._bin / "lookhaven-webapi", "--home", self.home, "--socket", self.socket,
+            "--module", module,
         )
         wait_until(pathlib.Path(self.socket).exists, 10, "the host listens")
 

@@ -13,7 +13,7 @@ import subprocess
 import tempfile
 import time
 
-from stand import Stand, cpu_nanos, descendants, private_kib, viewers
+from stand import Stand, busy, cpu_nanos, descendants, private_kib, viewers
 
 SECONDS = 10.0
 STREAMS = 32  # on one of a browser's connections
@@ -36,7 +36,7 @@ def measure(start_viewers, load, count, serving, front=None):
     run = start_viewers(count, SECONDS)
     time.sleep(2.0)
     processes, front_processes = serving(), front()
-    private = sorted(private_kib(pid) for pid in processes[-count:])
+    private = sorted(private_kib(pid) for pid in busy(processes)[-count:])
     before, front_before, start = cpu_nanos(processes), cpu_nanos(front_processes), time.monotonic()
     time.sleep(SECONDS - 4.0)
     seconds = time.monotonic() - start

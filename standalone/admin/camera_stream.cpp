@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/admin/camera_stream.h"
 
+#include "standalone/media/source_kinds.h"
+
 namespace lookhaven::admin {
 
 namespace {
@@ -24,8 +26,9 @@ void FillInFromStream(CameraSetup& setup, bool knows_audio, const Prober& prober
     if (live == nullptr) {
         return;
     }
-    if (live->source.starts_with("http")) {
-        setup.camera.video_type = base::Codec::kMjpeg;
+    const media::NetworkKind* kind = media::FindNetworkKind(live->source);
+    if (kind != nullptr && kind->sends_only_that) {
+        setup.camera.video_type = kind->usual_codec;
         return;
     }
     const media::ProbeResult found = ProbeStream(prober, kinds, live->source, setup.camera.insecure, setup.credentials);

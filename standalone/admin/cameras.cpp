@@ -30,9 +30,7 @@ constexpr std::chrono::milliseconds kMaxWaitForRecorder{5'000};
 constexpr std::chrono::milliseconds kPoll{100};
 
 Json::Value PlanJson(const std::optional<RecordingPlan>& stored) {
-    RecordingPlan plan;
-    plan.pre_s = 0;
-    plan = stored.value_or(plan);
+    const RecordingPlan plan = stored.value_or(store::NoPlan());
     Json::Value json;
     json["mode"] = base::NameOf(store::RecordModeNames(), plan.mode);
     json["hours"] = plan.hours.empty()

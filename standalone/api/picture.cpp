@@ -166,6 +166,7 @@ std::string At(const Call& call) {
         const std::string tag = '"' + std::to_string(frame.capture_millis) + '-' + std::to_string(width) + '"';
         cache = "Cache-Control: private, max-age=43200, immutable\r\nVary: Cookie\r\nETag: " + tag + "\r\n";
         if (call.request.Header("HTTP_IF_NONE_MATCH") == tag) {
+            call.slot.status = 304;
             return "Status: 304 Not Modified\r\n" + cache + "\r\n";
         }
     }

@@ -17,6 +17,7 @@
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
+#include "standalone/base/concat.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/base/sanitizers.h"
@@ -33,7 +34,6 @@ namespace {
 
 constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
 constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
-constexpr std::size_t kMaxBodyWithoutSession = 4096;
 constexpr std::size_t kMaxBody = std::size_t{1} << 20;
 constexpr const char* kManagersOnly = "only a manager may do this";
 constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
@@ -72,9 +72,8 @@ Call ReadCall(const Service& service, http::Request& request, control::SlotTable
               .counters = service.counters};
     call.login = FindLogin(call);
     const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
-    if (!call.login && body_bytes > kMaxBodyWithoutSession) {
-        throw Failure(call.Parameter("api") == kAuthApi.name ? 413 : 401,
-                      "log in first: without a session a body holds 4 KiB at most");
+    if (!call.login && body_bytes > http::kMaxBodyWithoutSession) {
+        throw SessionNeeded(call.Parameter("api") == kAuthApi.name);
     }
     const bool is_picture = IsPictureUpload(call);
     if (is_picture && call.login && !call.login->is_manager) {
@@ -241,6 +240,15 @@ void PrepareProcess(const base::Installation& installation) try {
     binding::RequestContext::Current().OpenRecordsAhead(installation);
 } catch (const std::exception&) {
     // The request fails likewise.
+}
+
+bool MayBeLogIn(const http::Request& request) {
+    return request.Header("REQUEST_METHOD") == "POST" &&
+           request.Header("QUERY_STRING").find(base::Concat("api=", kAuthApi.name)) != std::string_view::npos;
+}
+
+http::Failure SessionNeeded(bool is_log_in) {
+    return {is_log_in ? 413 : 401, "log in first: without a session a body holds 4 KiB at most"};
 }
 
 bool NeedsCounters(const http::Request& request) {

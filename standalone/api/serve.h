@@ -11,6 +11,7 @@
 #include "standalone/api/modules.h"
 #include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
+#include "standalone/http/answer.h"
 #include "standalone/http/request.h"
 #include "standalone/http/request_counters.h"
 
@@ -33,6 +34,13 @@ void PrepareProcess(const base::Installation& installation);
 // Whether the request may ask for the service's counters, of which each process has those of when it was forked. Not
 // exact: who disguises the name sees old ones.
 bool NeedsCounters(const http::Request& request);
+
+// Whether the request may be one of log-in, setting up or log-out. Not exact, and need not be: the web server lets through
+// few POSTs that name this api.
+bool MayBeLogIn(const http::Request& request);
+
+// For a request without a session whose body holds more than kMaxBodyWithoutSession.
+http::Failure SessionNeeded(bool is_log_in);
 
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down
 // for writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.

@@ -4,13 +4,13 @@
 #include <string>
 
 #include <fcntl.h>
-#include <unistd.h>
 
 #include "standalone/backup/backup.h"
 #include "standalone/base/file.h"
 #include "standalone/base/version.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/new_file.h"
 #include "standalone/cli/running.h"
 
 namespace lookhaven::cli {
@@ -26,26 +26,17 @@ Json::Value ToJson(const backup::Summary& summary) {
     return Object("records", summary.records, "pictures", summary.pictures, "certificate", summary.has_certificate);
 }
 
-// The file is opened first, as whoever runs the command: the installation's owner may not write there.
 void Backup(const Console& console, const Request& request) {
-    const base::FileDescriptor file = base::OpenFile(request.file, O_WRONLY | O_CREAT | O_EXCL);
-    try {
+    backup::Summary summary;
+    WriteNewFile(request.file, [&](int file) {
         store::Store store = console.OpenStore();
-        const backup::Summary summary = backup::Write(
-            console.Installation(), store, file.Get(),
+        summary = backup::Write(
+            console.Installation(), store, file,
             request.with_certificate ? backup::Certificate::kIncluded : backup::Certificate::kLeftOut, base::kVersion);
-        if (::fsync(file.Get()) != 0) {
-            base::ThrowErrno("cannot write " + request.file);
-        }
-        console.Answer(ToJson(summary), "Backed up ", summary.records, " records and ", summary.pictures,
-                       " pictures of e-maps to ", request.file,
-                       ", which holds the passwords of cameras: keep it where nobody else reads it.");
-    } catch (...) {
-        if (::unlink(request.file.c_str()) != 0) {
-            static_cast<void>(::ftruncate(file.Get(), 0));  // no longer ours to remove
-        }
-        throw;
-    }
+    });
+    console.Answer(ToJson(summary), "Backed up ", summary.records, " records and ", summary.pictures,
+                   " pictures of e-maps to ", request.file,
+                   ", which holds the passwords of cameras: keep it where nobody else reads it.");
 }
 
 void Restore(const Console& console, const Request& request) try {

@@ -131,7 +131,7 @@ void Add(const Console& console, const Request& request) {
         ProbeMissing(camera, request);
         ApplyPlan(camera, request);
     });
-    console.Answer(ToData(setup.camera, setup.plan.value_or(RecordingPlan())), "Added camera ", setup.camera.name,
+    console.Answer(ToData(setup.camera, setup.plan.value_or(store::NoPlan())), "Added camera ", setup.camera.name,
                    " with id ", setup.camera.id, "; it sends ", base::CodecTitle(setup.camera.video_type), ".");
 }
 
@@ -161,7 +161,7 @@ void Change(const Console& console, const Request& request) {
     const admin::CameraSetup setup =
         admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
                          [&request](admin::CameraSetup& camera) { Edit(camera, request); });
-    console.Answer(ToData(setup.camera, setup.plan.value_or(RecordingPlan())), "Changed camera ", request.id, ".");
+    console.Answer(ToData(setup.camera, setup.plan.value_or(store::NoPlan())), "Changed camera ", request.id, ".");
 }
 
 void List(const Console& console) {
@@ -171,7 +171,7 @@ void List(const Console& console) {
     Json::Value data = Json::arrayValue;
     for (const Camera& camera : Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
-        states.AddTo(data.append(ToData(camera, plan == plans.end() ? RecordingPlan() : plan->second)));
+        states.AddTo(data.append(ToData(camera, plan == plans.end() ? store::NoPlan() : plan->second)));
     }
     console.Answer(data, Table(kColumns, data));
 }
@@ -201,7 +201,7 @@ void Plan(const Console& console, const Request& request) {
                                      camera.plan = plan;
                                  });
     }
-    const Json::Value plan = PlanData(setup.plan.value_or(RecordingPlan()));
+    const Json::Value plan = PlanData(setup.plan.value_or(store::NoPlan()));
     console.Answer(plan, "Recorded: ", plan["mode"].asString(), "\n",
                    plan["mode"] == "schedule" ? HoursText(plan["hours"].asString()) : "");
 }

@@ -5,15 +5,14 @@
 #include <optional>
 #include <set>
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include "standalone/admin/kept_events.h"
 #include "standalone/base/clock.h"
-#include "standalone/base/file.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/event_text.h"
+#include "standalone/cli/new_file.h"
 #include "standalone/cli/units.h"
 #include "standalone/media/remux.h"
 #include "standalone/media/source.h"
@@ -225,21 +224,6 @@ void CopyTo(int output, const std::filesystem::path& recording, const media::Exp
     }
 }
 
-// Leaves no incomplete file behind.
-void CopyToFile(const std::string& file, const std::filesystem::path& recording, const media::ExportOptions& options) {
-    if (::access(file.c_str(), F_OK) == 0) {
-        throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
-    }
-    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
-    try {
-        CopyTo(output.Get(), recording, options);
-    } catch (...) {
-        std::error_code ignored;
-        std::filesystem::remove(file, ignored);
-        throw;
-    }
-}
-
 void Export(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::int64_t now = base::WallSeconds();
@@ -256,7 +240,7 @@ void Export(const Console& console, const Request& request) {
         CopyTo(STDOUT_FILENO, recording, options);
         return;
     }
-    CopyToFile(request.file, recording, options);
+    WriteNewFile(request.file, [&](int output) { CopyTo(output, recording, options); });
     const auto size_bytes = static_cast<Json::Int64>(std::filesystem::file_size(request.file));
     console.Answer(Object("id", request.id, "file", request.file, "size_bytes", size_bytes), "Event ", request.id,
                    " was exported to ", request.file, ".");

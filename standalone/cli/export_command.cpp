@@ -7,15 +7,14 @@
 #include <iostream>
 #include <map>
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
-#include "standalone/base/file.h"
 #include "standalone/base/io.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/export_checks.h"
+#include "standalone/cli/new_file.h"
 #include "standalone/cli/units.h"
 #include "standalone/evidence/manifest.h"
 #include "standalone/evidence/signing_key.h"
@@ -116,17 +115,7 @@ void Export(const Console& console, const Request& request) {
         WriteTo(STDOUT_FILENO, plan, remux, key);
         return;
     }
-    if (::access(file.c_str(), F_OK) == 0) {
-        throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
-    }
-    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
-    try {
-        WriteTo(output.Get(), plan, remux, key);
-    } catch (...) {
-        std::error_code ignored;
-        std::filesystem::remove(file, ignored);  // leaves no incomplete file behind
-        throw;
-    }
+    WriteNewFile(file, [&](int output) { WriteTo(output, plan, remux, key); });
     std::size_t gaps = 0;
     for (const evidence::Camera& camera : plan.cameras) {
         gaps += camera.gaps.size();

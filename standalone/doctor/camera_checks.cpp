@@ -10,6 +10,7 @@
 #include "standalone/control/common_config.h"
 #include "standalone/doctor/checks.h"
 #include "standalone/maintenance/recording_status.h"
+#include "standalone/media/source_kinds.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/value_names.h"
@@ -83,7 +84,8 @@ Findings CheckCameras(const base::Installation& installation) {
         store::Store store = store::Store::Open(installation.StoreUrl());
         for (const store::Camera& camera : store::Cameras(store).List()) {
             if (camera.insecure && std::ranges::any_of(camera.profiles, [](const store::CameraProfile& profile) {
-                    return profile.source.starts_with("https:");
+                    const media::NetworkKind* kind = media::FindNetworkKind(profile.source);
+                    return kind != nullptr && kind->has_tls;
                 })) {
                 findings.push_back(
                     {Concat("the HTTPS certificate of camera ", camera.id, " is not verified"),

@@ -3,6 +3,7 @@
 // What a process that the host has just forked does before its own work.
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <optional>
 
@@ -12,6 +13,8 @@
 #include "standalone/control/slot_table.h"
 
 namespace lookhaven::host {
+
+using Clock = std::chrono::steady_clock;
 
 struct Child {
     pid_t pid = 0;

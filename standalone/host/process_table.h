@@ -25,8 +25,6 @@
 
 namespace lookhaven::host {
 
-using Clock = std::chrono::steady_clock;
-
 struct ProcessLimits {
     std::chrono::milliseconds answer{30'000};  // for a request that turns out not to be a stream
     std::chrono::milliseconds leave{15'000};   // from the first SIGTERM to SIGKILL

@@ -28,7 +28,7 @@ class ScgiParser {
 
     static constexpr std::size_t kMaxHeadBytes = 8 * 1024;
     static constexpr std::size_t kMaxBodyBytes = 20 * 1024 * 1024;  // a picture's; the request's process allows less
-    static constexpr std::size_t kMaxAwaitedBodyBytes = 4096;
+    static constexpr std::size_t kMaxAwaitedBodyBytes = http::kMaxBodyWithoutSession;
 
     // A request is complete once its body is, or its head where the body is large: the rest stays unread. Bytes behind
     // an awaited body make a request malformed.

@@ -16,7 +16,6 @@
 #include "standalone/base/log.h"
 #include "standalone/control/player_file.h"
 #include "standalone/host/signals.h"
-#include "standalone/http/answer.h"
 
 namespace lookhaven::host {
 
@@ -27,19 +26,8 @@ constexpr std::chrono::seconds kWatcherRestart{1};
 constexpr std::chrono::seconds kSpareRestart{1};
 constexpr std::chrono::milliseconds kAcceptAgain{200};
 
-int MillisUntil(Clock::time_point due) {
-    if (due == Clock::time_point::max()) {
-        return -1;
-    }
-    return static_cast<int>(
-        std::max(std::chrono::ceil<std::chrono::milliseconds>(due - Clock::now()), std::chrono::milliseconds{0})
-            .count());
-}
-
-// Not exact, and need not be: the web server lets through few POSTs that name this api.
-bool LooksLikeLogIn(const http::Request& request) {
-    return request.Header("REQUEST_METHOD") == "POST" &&
-           request.Header("QUERY_STRING").find("api=VEXO.Auth") != std::string_view::npos;
+http::Failure Busy(const std::string& message) {
+    return {503, message, http::kRetrySoonSeconds};
 }
 
 }  // namespace
@@ -61,63 +49,46 @@ Server::Server(const base::Installation& installation, Callbacks callbacks, List
                .serve = [this](http::Request& request,
                                control::Slot& slot) { callbacks_.serve_request(request, slots_, slot); }}),
       listener_(listener),
-      poll_(::epoll_create1(EPOLL_CLOEXEC)),
       signals_(BlockSignals()) {
-    if (!poll_ || !signals_) {
+    if (!signals_) {
         base::ThrowErrno("cannot set up the host");
     }
     // What the players of a host that was killed have left.
     std::filesystem::remove_all(installation.ProgressFolder());
     control::SweepPlayerFiles();
-    Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
-    Watch(signals_.Get(), Kind::kSignals, 0, EPOLLIN);
-    Watch(slots_.WakeDescriptor(), Kind::kWake, 0, EPOLLIN);
+    poll_.Watch(listener_.Socket(), Awaited::kListener, 0, EPOLLIN);
+    poll_.Watch(signals_.Get(), Awaited::kSignals, 0, EPOLLIN);
+    poll_.Watch(slots_.WakeDescriptor(), Awaited::kWake, 0, EPOLLIN);
 }
 
 void Server::Run() {
-    std::array<epoll_event, 64> events{};
     base::TellReady();
     while (!ending_ || !processes_.IsEmpty()) {
-        const int timeout = MillisUntil(DoWhatIsDue());
-        const int ready = ::epoll_wait(poll_.Get(), events.data(), static_cast<int>(events.size()), timeout);
-        for (int i = 0; i < ready; ++i) {
-            const std::uint64_t tag = events[static_cast<std::size_t>(i)].data.u64;
-            Handle(static_cast<Kind>(tag >> 32), static_cast<std::uint32_t>(tag));
-        }
+        poll_.Wait(DoWhatIsDue(), [this](Awaited kind, std::uint32_t id) { Handle(kind, id); });
     }
     EndWatcher();
 }
 
-void Server::Watch(int descriptor, Kind kind, std::uint32_t id, std::uint32_t events) {
-    epoll_event event{};
-    event.events = events;
-    event.data.u64 = (std::uint64_t{static_cast<std::uint32_t>(kind)} << 32) | id;
-    if (::epoll_ctl(poll_.Get(), EPOLL_CTL_ADD, descriptor, &event) != 0 &&
-        ::epoll_ctl(poll_.Get(), EPOLL_CTL_MOD, descriptor, &event) != 0) {
-        base::ThrowErrno("cannot watch a descriptor");
-    }
-}
-
-void Server::Handle(Kind kind, std::uint32_t id) {
+void Server::Handle(Awaited kind, std::uint32_t id) {
     switch (kind) {
-    case Kind::kListener:
+    case Awaited::kListener:
         return Accept();
-    case Kind::kSignals:
+    case Awaited::kSignals:
         return BeginShutdown();
-    case Kind::kWake:
+    case Awaited::kWake:
         slots_.ClearWake();
         processes_.LookAtPlayers();
         return processes_.EndMarked();
-    case Kind::kWatcher:
+    case Awaited::kWatcher:
         base::LogWarning("the session watcher has ended");
         EndWatcher();
         watcher_due_ = ending_ ? Clock::time_point::max() : Clock::now() + kWatcherRestart;
         return;
-    case Kind::kConnection:
+    case Awaited::kConnection:
         return Read(static_cast<int>(id));
-    case Kind::kHangUp:
+    case Awaited::kHangUp:
         return processes_.HangUp(static_cast<pid_t>(id));
-    case Kind::kProcess:
+    case Awaited::kProcess:
         return Reap(static_cast<pid_t>(id));
     }
 }
@@ -128,7 +99,7 @@ void Server::Accept() {
     if (!socket) {
         if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == ENOBUFS) {
             base::LogError("cannot accept a connection: out of memory, or too many open files");
-            Watch(listener_.Socket(), Kind::kListener, 0, 0);
+            poll_.Watch(listener_.Socket(), Awaited::kListener, 0, 0);
             accept_due_ = Clock::now() + kAcceptAgain;
         }
         return;
@@ -136,9 +107,9 @@ void Server::Accept() {
     const int number = socket.Get();
     Connection& connection = connections_[number];
     connection = {std::move(socket), {}, Clock::now() + limits_.read, false};
-    Watch(number, Kind::kConnection, static_cast<std::uint32_t>(number), EPOLLIN);
+    poll_.Watch(number, Awaited::kConnection, static_cast<std::uint32_t>(number), EPOLLIN);
     if (connections_.size() > limits_.requests) {
-        Refuse(connection, 503, "too many requests are waiting");
+        Refuse(connection, Busy("too many requests are waiting"));
     }
 }
 
@@ -163,7 +134,7 @@ void Server::Read(int socket) {
         case ScgiParser::State::kIncomplete:
             return;
         case ScgiParser::State::kMalformed:
-            return Refuse(connection, 400, std::string(connection.parser.Problem()));
+            return Refuse(connection, {400, std::string(connection.parser.Problem())});
         case ScgiParser::State::kComplete:
             Connection complete = std::move(connection);
             connections_.erase(found);
@@ -174,10 +145,9 @@ void Server::Read(int socket) {
 
 // The connection stays open for a moment and its further bytes are dropped: closing at once would reset it, and the
 // client might lose the answer.
-void Server::Refuse(Connection& connection, int status, const std::string& message) {
-    counters_.NoteRefused(status);
-    const std::string answer =
-        http::FailureAnswer(http::Failure(status, message, status == 503 ? http::kRetrySoonSeconds : 0));
+void Server::Refuse(Connection& connection, const http::Failure& failure) {
+    counters_.NoteRefused(failure.Status());
+    const std::string answer = http::FailureAnswer(failure);
     ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
     ::shutdown(connection.socket.Get(), SHUT_WR);
     connection.refused = true;
@@ -187,27 +157,27 @@ void Server::Refuse(Connection& connection, int status, const std::string& messa
 void Server::StartRequest(Connection connection) {
     const int number = connection.socket.Get();
     http::Request request = connection.parser.TakeRequest();
-    if (request.unread_body_bytes > 0 && !callbacks_.may_have_session(request)) {
-        const bool is_log_in = LooksLikeLogIn(request);
-        request.Wipe();
-        return Refuse(connections_[number] = std::move(connection), is_log_in ? 413 : 401,
-                      "log in first: without a session a body holds 4 KiB at most");
+    if (request.unread_body_bytes > 0) {
+        if (const std::optional<http::Failure> failure = callbacks_.refuse_unread(request)) {
+            request.Wipe();
+            return Refuse(connections_[number] = std::move(connection), *failure);
+        }
     }
-    control::Slot* slot = slots_.Take(LooksLikeLogIn(request) ? 0 : limits_.kept_for_log_in);
+    control::Slot* slot = slots_.Take(callbacks_.is_log_in(request) ? 0 : limits_.kept_for_log_in);
     if (slot == nullptr) {
         request.Wipe();
-        return Refuse(connections_[number] = std::move(connection), 503, "too many requests are running");
+        return Refuse(connections_[number] = std::move(connection), Busy("too many requests are running"));
     }
     std::optional<Child> child = StartRequestProcess(request, number, *slot);
     request.Wipe();
     if (!child) {
         slots_.Free(*slot);
-        return Refuse(connections_[number] = std::move(connection), 503, "cannot start a request process");
+        return Refuse(connections_[number] = std::move(connection), Busy("cannot start a request process"));
     }
     const pid_t pid = child->pid;
     processes_.Add(*std::move(child), std::move(connection.socket), *slot);
     // Once: the connection stays open, and hung up, until the process is gone.
-    Watch(number, Kind::kHangUp, static_cast<std::uint32_t>(pid), EPOLLONESHOT);
+    poll_.Watch(number, Awaited::kHangUp, static_cast<std::uint32_t>(pid), EPOLLONESHOT);
 }
 
 std::optional<Child> Server::StartRequestProcess(http::Request& request, int connection, control::Slot& slot) {
@@ -223,7 +193,7 @@ std::optional<Child> Server::StartRequestProcess(http::Request& request, int con
         callbacks_.serve_request(request, slots_, slot);
     });
     if (child) {
-        Watch(child->process.Get(), Kind::kProcess, static_cast<std::uint32_t>(child->pid), EPOLLIN);
+        poll_.Watch(child->process.Get(), Awaited::kProcess, static_cast<std::uint32_t>(child->pid), EPOLLIN);
     }
     return child;
 }
@@ -235,7 +205,7 @@ void Server::StartSpare() {
     }
     const Child* spare = spares_.Start();
     if (spare != nullptr) {
-        Watch(spare->process.Get(), Kind::kProcess, static_cast<std::uint32_t>(spare->pid), EPOLLIN);
+        poll_.Watch(spare->process.Get(), Awaited::kProcess, static_cast<std::uint32_t>(spare->pid), EPOLLIN);
     }
     spare_due_ = Clock::now() + (spare == nullptr ? Clock::duration(kSpareRestart) : Clock::duration(0));
 }
@@ -257,7 +227,7 @@ void Server::StartWatcher() {
         watcher_due_ = Clock::now() + kWatcherRestart;
         return;
     }
-    Watch(watcher_->process.Get(), Kind::kWatcher, 0, EPOLLIN);
+    poll_.Watch(watcher_->process.Get(), Awaited::kWatcher, 0, EPOLLIN);
 }
 
 void Server::EndWatcher() {
@@ -289,7 +259,7 @@ Clock::time_point Server::DoWhatIsDue() {
         StartSpare();
     }
     if (now >= accept_due_ && !ending_) {
-        Watch(listener_.Socket(), Kind::kListener, 0, EPOLLIN);
+        poll_.Watch(listener_.Socket(), Awaited::kListener, 0, EPOLLIN);
         accept_due_ = Clock::time_point::max();
     }
     if (now >= alive_due_) {
@@ -301,7 +271,7 @@ Clock::time_point Server::DoWhatIsDue() {
     for (auto at = connections_.begin(); at != connections_.end();) {
         Connection& connection = at->second;
         if (now >= connection.until && !connection.refused) {
-            Refuse(connection, 408, "the request did not arrive in time");
+            Refuse(connection, {408, "the request did not arrive in time"});
         }
         if (now >= connection.until) {
             at = connections_.erase(at);

@@ -7,7 +7,6 @@
 // Thread safety One thread, and no other in the process.
 #pragma once
 
-#include <array>
 #include <chrono>
 #include <cstdint>
 #include <functional>
@@ -20,10 +19,12 @@
 #include "standalone/base/service_manager.h"
 #include "standalone/control/slot_table.h"
 #include "standalone/host/child.h"
+#include "standalone/host/event_poll.h"
 #include "standalone/host/listener.h"
 #include "standalone/host/process_table.h"
 #include "standalone/host/scgi.h"
 #include "standalone/host/spare_processes.h"
+#include "standalone/http/answer.h"
 #include "standalone/http/request.h"
 #include "standalone/http/request_counters.h"
 
@@ -40,8 +41,10 @@ struct Callbacks {
     // In a process of its own after LeaveHost: marks the slots whose session has ended elsewhere, again and again; does
     // not return.
     std::function<void(control::SlotTable&)> watch_sessions;
-    // In the host, and must not block: false when the request surely belongs to no session.
-    std::function<bool(const http::Request&)> may_have_session;
+    // In the host, and must not block: whether it may take a slot that is kept for log-ins.
+    std::function<bool(const http::Request&)> is_log_in;
+    // In the host, and must not block: why a request with an unread body gets no process; nothing where it does.
+    std::function<std::optional<http::Failure>(const http::Request&)> refuse_unread;
 };
 
 struct ServerLimits {
@@ -64,8 +67,6 @@ class Server {
     void Run();
 
   private:
-    enum class Kind : std::uint32_t { kListener, kSignals, kWake, kWatcher, kConnection, kHangUp, kProcess };
-
     // A connection whose request has not been read to its end, or whose refusal has not been read.
     struct Connection {
         base::FileDescriptor socket;
@@ -74,11 +75,10 @@ class Server {
         bool refused = false;
     };
 
-    void Watch(int descriptor, Kind kind, std::uint32_t id, std::uint32_t events);
-    void Handle(Kind kind, std::uint32_t id);
+    void Handle(Awaited kind, std::uint32_t id);
     void Accept();
     void Read(int socket);
-    void Refuse(Connection& connection, int status, const std::string& message);
+    void Refuse(Connection& connection, const http::Failure& failure);
     void StartRequest(Connection connection);
     std::optional<Child> StartRequestProcess(http::Request& request, int connection, control::Slot& slot);
     void StartSpare();
@@ -96,7 +96,7 @@ class Server {
     SpareProcesses spares_;
     std::map<int, Connection> connections_;
     Listener& listener_;
-    base::FileDescriptor poll_;
+    EventPoll poll_;
     base::FileDescriptor signals_;
     std::optional<Child> watcher_;
     Clock::time_point watcher_due_ = Clock::time_point::min();  // when to start it

@@ -10,6 +10,9 @@
 
 namespace lookhaven::http {
 
+// A longer body is read by the request's own process, and only of a caller with a session.
+constexpr std::size_t kMaxBodyWithoutSession = 4 * 1024;
+
 struct Request {
     // By their CGI names: REQUEST_METHOD, QUERY_STRING, HTTP_COOKIE …
     std::map<std::string, std::string, std::less<>> headers;

@@ -24,13 +24,15 @@ struct NetworkKind {
     std::string_view default_port;
     Protocol protocol;
     base::Codec usual_codec;  // taken for what its cameras send until one has been looked at
+    bool sends_only_that;     // and no sound, so that nobody needs to look
+    bool has_tls;             // with a certificate that is verified unless the camera's record says otherwise
 };
 
 // Needs no libav, so that request processes have it, too.
 inline constexpr std::array<NetworkKind, 3> kNetworkKinds{{
-    {"rtsp://", "554", Protocol::kRtsp, base::Codec::kH264},
-    {"http://", "80", Protocol::kMjpegOverHttp, base::Codec::kMjpeg},
-    {"https://", "443", Protocol::kMjpegOverHttp, base::Codec::kMjpeg},
+    {"rtsp://", "554", Protocol::kRtsp, base::Codec::kH264, false, false},
+    {"http://", "80", Protocol::kMjpegOverHttp, base::Codec::kMjpeg, true, false},
+    {"https://", "443", Protocol::kMjpegOverHttp, base::Codec::kMjpeg, true, true},
 }};
 
 // Null for an address of none.

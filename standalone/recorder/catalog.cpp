@@ -11,15 +11,10 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// A camera without a plan of its own has no pre-record: its stream would have to run all the time.
 CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::RecordingPlan>& plans,
                   store::Mounts& mounts) {
     const auto found = plans.find(camera.id);
-    store::RecordingPlan plan;
-    plan.pre_s = 0;
-    if (found != plans.end()) {
-        plan = found->second;
-    }
+    const store::RecordingPlan plan = found == plans.end() ? store::NoPlan() : found->second;
     const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
     CameraPlan result{camera.name,
                       plan.mode,

@@ -82,7 +82,7 @@ Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_
     }
     return connection_.Write([&](soci::session& sql) {
         RequireCameraRow(sql, camera_id);
-        RecordingPlan plan;
+        RecordingPlan plan = NoPlan();
         std::tie(plan.pre_s, plan.post_s) =
             FetchOne<std::pair<int, int>>(
                 sql, "select pre_record, post_record from recording_plans where camera_id = :camera", camera_id)

@@ -78,7 +78,7 @@ void RecordingPlans::Set(int camera_id, const RecordingPlan& plan) {
 }
 
 RecordingPlan RecordingPlans::Find(int camera_id) {
-    return connection_.FetchOne<PlanRow>("where camera_id = :camera", camera_id).value_or(PlanRow()).second;
+    return connection_.FetchOne<PlanRow>("where camera_id = :camera", camera_id).value_or(PlanRow(0, NoPlan())).second;
 }
 
 std::map<int, RecordingPlan> RecordingPlans::List() {

@@ -21,7 +21,7 @@ constexpr int kMinSegmentSeconds = 10;
 constexpr int kMaxSegmentSeconds = 3600;
 constexpr int kMaxAroundMarkSeconds = 300;
 
-// A camera without a plan of its own has this default.
+// A camera's first plan begins as this.
 struct RecordingPlan {
     RecordMode mode = RecordMode::kNever;
     int segment_s = 300;  // kMinSegmentSeconds … kMaxSegmentSeconds
@@ -38,6 +38,12 @@ struct RecordingPlan {
     friend bool operator==(const RecordingPlan&, const RecordingPlan&) = default;
 };
 
+// What holds for a camera without a plan of its own: it is recorded around its marks, but not before them, for which its
+// stream would have to run all the time.
+inline RecordingPlan NoPlan() {
+    return {.pre_s = 0};
+}
+
 // What the mode and the hours of a plan say of that hour of the week.
 HourMode ModeOfHour(RecordMode mode, const std::string& hours, int hour_of_week);
 
@@ -48,7 +54,7 @@ class RecordingPlans {
 
     // Raises Settings::Revision(). Throws InvalidRecord, or NotFound for an unknown camera or mount.
     void Set(int camera_id, const RecordingPlan& plan);
-    RecordingPlan Find(int camera_id);
+    RecordingPlan Find(int camera_id);  // NoPlan() where the camera has none
     // By camera, those without a plan of their own left out.
     std::map<int, RecordingPlan> List();
 

@@ -96,7 +96,13 @@ void Run(const Options& options) {
         .prepare_process = [&] { api::PrepareProcess(installation); },
         .needs_fork = [](const http::Request& request) { return api::NeedsCounters(request); },
         .watch_sessions = [&](control::SlotTable& slots) { api::WatchSessions(installation, slots, filter); },
-        .may_have_session = [&](const http::Request& request) { return filter.MayHaveSession(request); }};
+        .is_log_in = api::MayBeLogIn,
+        .refuse_unread = [&](const http::Request& request) -> std::optional<http::Failure> {
+            if (filter.MayHaveSession(request)) {
+                return std::nullopt;
+            }
+            return api::SessionNeeded(api::MayBeLogIn(request));
+        }};
     host::Server server(installation, callbacks, listener, counters, options.limits);
     base::LogInfo("serving on " + listener.Name());
     server.Run();

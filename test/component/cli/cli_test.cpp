@@ -265,7 +265,7 @@ TEST_F(CliTest, AnInstallationMayKeepItsStoreInPostgresql) {
           {"user list", 0, "viewer"},
           {"store show", 0, "postgresql:"},
           {"backup " + backup, 0, "Backed up"},
-          {"backup " + backup, 71, "exists"},
+          {"backup " + backup, 73, "already a file"},
           {"restore " + backup, 65, "accounts"},
           {"restore " + backup + "-absent", 66, "absent"},
           {"restore /dev/null", 65, "no backup"},

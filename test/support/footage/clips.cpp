@@ -7,6 +7,7 @@
 #include <memory>
 #include <stop_token>
 
+#include "standalone/archive/recording_reader.h"
 #include "standalone/media/demuxer.h"
 #include "test/support/footage/archive_folder.h"
 
@@ -78,6 +79,12 @@ void Record(const Clip& clip, const std::filesystem::path& path, bool close, std
     } else {
         writer.Flush();
     }
+}
+
+std::vector<archive::FrameEntry> Entries(const std::filesystem::path& recording) {
+    const archive::RecordingReader opened(recording);
+    const auto entries = opened.Entries(0);
+    return {entries.begin(), entries.end()};
 }
 
 std::string Probe(const std::filesystem::path& path) {

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "standalone/archive/frame_index.h"
 #include "standalone/media/packet.h"
 #include "standalone/media/recording_writer.h"
 
@@ -46,6 +47,9 @@ inline const char* const kH265 = "-c:v libx265 -preset ultrafast -bf 2 -g 25 -x2
 // Records the clip's packets [0, count) into path; finished when close is set, else as it would be after a kill.
 void Record(const Clip& clip, const std::filesystem::path& path, bool close = true, std::size_t count = SIZE_MAX,
             std::int64_t start_wall_ms = 1'772'352'930'000);
+
+// What the recording's index says of its frames.
+std::vector<archive::FrameEntry> Entries(const std::filesystem::path& recording);
 
 // Decodes the whole file. Each stream's codec and number of frames, one per line ("h264,100"), and ffprobe's
 // complaints.

@@ -41,7 +41,9 @@ export class PlayerTile {
     player.show = ({ jpeg }, signal) => this.#draw(jpeg, () => !signal.aborted);
     this.#again.addEventListener("click", actions.again);
     this.#large = iconButton("fit", `${name} large`, () => actions.enlarge(), "Enter");
-    const buttons = element("div", { class: "stage-buttons" }, this.#large, iconButton("close", `Close ${name}`, () => actions.close()));
+    const close = iconButton("close", `Close ${name}`, () => actions.close());
+    close.classList.add("stage-close");
+    const buttons = element("div", { class: "stage-buttons" }, this.#large, close);
     const message = element(
       "div",
       { class: "message" },

@@ -129,7 +129,7 @@ export class MapsScreen extends Screen {
     this.#cameras = cameras.camera ?? [];
     this.#names.replaceChildren(...maps.map(({ id, name }) => element("option", { value: String(id) }, name)));
     this.#names.hidden = this.#tools.hidden = maps.length === 0;
-    this.#showMessage(maps.length > 0 ? "" : "There are no maps yet. A manager adds one with lookhaven emap add.");
+    this.#showMessage(maps.length > 0 ? "" : "There are no maps yet. A manager adds one in the settings.");
     this.followRoute();
   }
 

@@ -123,9 +123,8 @@ export class WallScreen extends Screen {
     this.#absent.update(list);
     this.#showTiles();
     if (this.#cameras.length + this.#absent.all.length > 0) this.#message.replaceChildren();
-    else if (list.CamNum > 0) this.#showMessage("camera", "No camera is switched on. A manager switches one on with “lookhaven camera set 1 --enable”.");
-    else if (list.isManager)
-      this.#showMessage("camera", "No cameras yet. Add one on the server with “lookhaven camera add”.");
+    else if (list.CamNum > 0) this.#showMessage("camera", "No camera is enabled.", ...settingsLink(list, "Enable one"));
+    else if (list.isManager) this.#showMessage("camera", "There are no cameras yet.", ...settingsLink(list, "Add one"));
     else this.#showMessage("camera", "You do not have permission to view any camera yet. Ask a manager for it.");
     this.#showAdvice(this.#cameras.some(({ video_type }) => video_type !== kVideoTypeMjpeg));
     this.followRoute();
@@ -142,8 +141,8 @@ export class WallScreen extends Screen {
     if (missing && !this.#advice.hasChildNodes()) this.#advice.append(...unplayableHint(missing));
   }
 
-  #showMessage(name: IconName, sentence: string): void {
-    this.#message.replaceChildren(icon(name), element("p", { role: "status" }, sentence));
+  #showMessage(name: IconName, sentence: string, ...links: HTMLElement[]): void {
+    this.#message.replaceChildren(icon(name), element("p", { role: "status" }, sentence), ...links);
   }
 
   #refresh(): void {
@@ -161,4 +160,8 @@ export class WallScreen extends Screen {
     const next = cameras[(at + by + cameras.length) % cameras.length];
     if (next) showCamera(next.id);
   }
+}
+
+function settingsLink({ isManager }: CameraList, text: string): HTMLElement[] {
+  return isManager ? [element("a", { href: "#settings=cameras" }, text)] : [];
 }
