@@ -56,6 +56,7 @@ import "./style/accounts.css";
 import "./style/emaps.css";
 import "./style/devices.css";
 import "./style/storage.css";
+import "./style/hosts.css";
 import "./style/audit.css";
 import "./style/system.css";
 import { App } from "./ui/app";

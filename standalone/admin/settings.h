@@ -18,6 +18,9 @@
 
 namespace lookhaven::admin {
 
+// Of the setting without which this host shows no cameras of others.
+inline constexpr const char* kCentralManagement = "cms";
+
 struct Setting {
     enum class Kind {
         kNumber,

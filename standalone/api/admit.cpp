@@ -76,7 +76,7 @@ CostClass CostClassOf(const Call& call) {
         return CostClass::kSearch;
     }
     const bool is_light = call.api == kAuthApi.name || call.api == kPlaybackApi.name || call.api == kRelayApi.name ||
-                          call.api == kSystemApi.name || call.api == kCameraApi.name;
+                          call.api == kServerApi.name || call.api == kSystemApi.name || call.api == kCameraApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 

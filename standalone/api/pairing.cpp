@@ -1,15 +1,23 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Pairing: what a paired host may ask, which has no session here but a token.
+// VEXO.Pairing: what another host may ask, which has no session here but a token; or, to become a paired one, the
+// secret of a code that was shown here.
+#include "standalone/admin/invitation.h"
+#include "standalone/api/login_log.h"
+#include "standalone/api/named_list.h"
 #include "standalone/api/own_apis.h"
+#include "standalone/api/password_check.h"
+#include "standalone/base/clock.h"
+#include "standalone/store/cameras.h"
 
 #include "platform/admission/pairauth.h"
-#include "standalone/api/named_list.h"
-#include "standalone/store/cameras.h"
 
 namespace lookhaven::api {
 
 namespace {
+
+// Where attempts are counted and logged.
+constexpr const char* kCode = "pairing code";
 
 std::string CookieOf(const Call& call, const std::string& name) {
     const auto found = call.cookies.find(name);
@@ -17,20 +25,52 @@ std::string CookieOf(const Call& call, const std::string& name) {
 }
 
 // As in the line that pairs two hosts.
+Json::Value OwnCameras(const Call& call) {
+    return NamedList(store::Cameras(call.Records()).List(), [](Json::Value& json, const store::Camera& camera) {
+        json["video"] = static_cast<int>(camera.video_type);
+        json["audio"] = camera.audio;
+    });
+}
+
 std::string Cameras(const Call& call) {
     if (!IsAuthPairMatch(CookieOf(call, "token"), CookieOf(call, "timestamp"))) {
         throw Failure(401, "no token of a paired host");
     }
     Json::Value data;
-    data["camera"] =
-        NamedList(store::Cameras(call.Records()).List(), [](Json::Value& json, const store::Camera& camera) {
-            json["video"] = static_cast<int>(camera.video_type);
-            json["audio"] = camera.audio;
-        });
+    data["camera"] = OwnCameras(call);
     return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {{"Cameras", Cameras}};
+// Throws admin::InvalidInvitation; Failure 429.
+std::string TryCode(const Call& call, const std::string& address) {
+    const std::string code = call.Parameter("code").asString();  // a number, where all its digits are decimal ones
+    const base::BootTime now = base::TimeSinceBoot();
+    admin::RequireInvitation(call.Records(), now);
+    CountAttempt(call, kCode);
+    std::string secret = admin::AcceptInvitation(call.Records(), code, address, now);
+    ForgetAttempts(call, kCode);
+    return secret;
+}
+
+std::string Accept(const Call& call) {
+    RequireNotInQuery(call, {"code"});
+    const std::string address(call.request.Header("REMOTE_ADDR"));
+    const base::Installation& installation = call.context.Installation();
+    try {
+        Json::Value data;
+        data["secret"] = TryCode(call, address);
+        data["camera"] = OwnCameras(call);
+        return SuccessAnswer(data);
+    } catch (const admin::InvalidInvitation& error) {
+        LogRefused(installation, kCode, address, error.what());
+        throw Failure(403, error.what());
+    } catch (const Failure& failure) {
+        LogRefused(installation, kCode, address, failure.what());
+        throw;
+    }
+}
+
+constexpr Method kMethods[] = {{"Cameras", Cameras}, {"Accept", Accept, Method::Effect::kChanges}};
 
 }  // namespace
 

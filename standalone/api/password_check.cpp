@@ -17,9 +17,6 @@ namespace {
 // Whoever is logged in can ask for hashes without end, with the right password, and must keep nobody from logging in.
 constexpr control::HashingLimits kHashingLimits{.in_all = 4, .of_users = 2, .of_user = 1};
 
-// Stands for an account where attempts are counted; no account's name has a space.
-constexpr const char* kSetup = "first account";
-
 // Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
 // All machines of a link share its link-local network.
 std::string NetworkOf(std::string_view address) {
@@ -89,12 +86,20 @@ void CheckSetupToken(const Call& call, const std::string& token) {
         admin::RequireSetupToken(call.Records(), token, base::TimeSinceBoot());
     } catch (const admin::InvalidToken&) {
         // After the look at the token: whoever shares the owner's network must not keep the right one out.
-        const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
-        store::LoginThrottle throttle(call.Records());
-        RefuseUnlessNow(throttle.Wait(kSetup, network, base::WallSeconds()), "setup token");
-        RefuseUnlessNow(throttle.Enter(kSetup, network, base::WallSeconds()), "setup token");
+        CountAttempt(call, "setup token");
         throw;
     }
+}
+
+void CountAttempt(const Call& call, const char* secret) {
+    const std::string network = NetworkOf(call.request.Header("REMOTE_ADDR"));
+    store::LoginThrottle throttle(call.Records());
+    RefuseUnlessNow(throttle.Wait(secret, network, base::WallSeconds()), secret);
+    RefuseUnlessNow(throttle.Enter(secret, network, base::WallSeconds()), secret);
+}
+
+void ForgetAttempts(const Call& call, const char* secret) {
+    store::LoginThrottle(call.Records()).Clear(secret, NetworkOf(call.request.Header("REMOTE_ADDR")));
 }
 
 std::string RequireNewPassword(const Call& call, const std::string& parameter) {

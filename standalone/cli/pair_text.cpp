@@ -12,8 +12,6 @@ namespace lookhaven::cli {
 
 namespace {
 
-constexpr std::string_view kPrefix = "lookhaven-pair-1:";
-
 PairOffer Read(const Json::Value& json) {
     return {json["address"].asString(), json["port"].asInt(), json["certificate"].asString(), json["secret"].asString(),
             remote::CamerasIn(json["cameras"])};
@@ -26,15 +24,15 @@ std::string ToText(const PairOffer& offer) {
         return Object("id", camera.id_on_server, "name", camera.name, "video", static_cast<int>(camera.video_type),
                       "audio", camera.audio);
     });
-    return std::string(kPrefix) +
+    return std::string(kPairTextPrefix) +
            base::ToBase64(base::IndentedJson(Object("address", offer.address, "port", offer.port, "certificate",
                                                     offer.certificate, "secret", offer.secret, "cameras", cameras)));
 }
 
 PairOffer ParsePairText(const std::string& text) {
     std::string_view rest = text;
-    if (rest.starts_with(kPrefix)) {
-        rest.remove_prefix(kPrefix.size());
+    if (rest.starts_with(kPairTextPrefix)) {
+        rest.remove_prefix(kPairTextPrefix.size());
         const Json::Value json = ParseJson(base::FromBase64(rest).value_or(""));
         try {
             if (json.isObject()) {

@@ -20,6 +20,8 @@ struct PairOffer {
     std::vector<store::RemoteCamera> cameras;  // server_id is 0
 };
 
+constexpr std::string_view kPairTextPrefix = "lookhaven-pair-1:";
+
 std::string ToText(const PairOffer& offer);
 
 // Throws Failure kDataError for any other text.

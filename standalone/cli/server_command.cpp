@@ -4,12 +4,16 @@
 //
 // Why so        Pairing takes one line of text, which a person carries from the host that has the cameras to the one
 //               that is to show them: the host's address and certificate, its cameras, and a secret that only the two
-//               share.
+//               share. Or a short code, which a person can read out, and by which the two exchange the rest themselves.
 #include <iostream>
 #include <optional>
 
 #include <unistd.h>
 
+#include "standalone/admin/invitation.h"
+#include "standalone/admin/pair_by_code.h"
+#include "standalone/admin/servers.h"
+#include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/host_name.h"
 #include "standalone/cli/command_group.h"
@@ -18,7 +22,7 @@
 #include "standalone/cli/table.h"
 #include "standalone/remote/certificate.h"
 #include "standalone/remote/paired_host.h"
-#include "standalone/store/secret.h"
+#include "standalone/store/cameras.h"
 #include "standalone/store/servers.h"
 
 namespace lookhaven::cli {
@@ -30,7 +34,6 @@ using store::RecordingServers;
 using store::RemoteCamera;
 
 constexpr int kDefaultPort = 8443;
-constexpr std::size_t kSecretBytes = 32;
 
 struct Request {
     int id = 0;
@@ -38,12 +41,7 @@ struct Request {
     std::string name;
     std::string address;
     int port = kDefaultPort;
-    struct {
-        std::optional<std::string> name;
-        std::optional<std::string> address;
-        std::optional<int> port;
-        std::optional<bool> enabled;
-    } change;
+    admin::ServerChange change;
 };
 
 Json::Value ToData(const RecordingServer& server) {
@@ -73,6 +71,10 @@ std::vector<RemoteCamera> OwnCameras(store::Store& store) {
     return cameras;
 }
 
+std::string OwnCertificate(const Console& console) {
+    return base::ReadFile(console.Installation().TlsFolder() / "certificate.pem");
+}
+
 // Only the line itself goes to standard output, so that it can be redirected.
 void Pair(const Console& console, const Request& request) {
     const std::string address = request.address.empty() ? base::OwnHostName() : request.address;
@@ -80,25 +82,38 @@ void Pair(const Console& console, const Request& request) {
         throw Failure(kDataError, "the address ", address, " is neither a host name nor an IP address");
     }
     store::Store store = console.OpenStore();
-    const std::string certificate =
-        remote::CertificatesIn(base::ReadFile(console.Installation().TlsFolder() / "certificate.pem"));
-    const PairOffer offer{address, request.port, certificate, store::RandomHex(kSecretBytes), OwnCameras(store)};
-    RecordingServer watcher;
-    watcher.name = request.name;
-    watcher.id = RecordingServers(store).Pair(watcher, offer.secret, {});
-    Json::Value data = ToData(watcher);
-    data["text"] = ToText(offer);
-    console.Answer(data, ToText(offer));
+    const std::string certificate = remote::CertificatesIn(OwnCertificate(console));
+    const std::vector<RemoteCamera> cameras = OwnCameras(store);
+    const admin::NewPairing made = admin::AdmitServer(store, {}, request.name);
+    const std::string text = ToText({address, request.port, certificate, made.secret, cameras});
+    Json::Value data = ToData(made.server);
+    data["text"] = text;
+    console.Answer(data, text);
     if (!console.json) {
         std::cerr
-            << "Enter this line in \"lookhaven server add\" on " << watcher.name
+            << "Enter this line in \"lookhaven server add\" on " << request.name
             << ", which may then show every camera of this host. Keep it secret: anyone who has it may do the same.\n";
+    }
+}
+
+// Likewise.
+void Invite(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const std::string code =
+        admin::Invite(store, {}, request.name, remote::ReadCertificate(OwnCertificate(console)), base::TimeSinceBoot());
+    console.Answer(Object("code", code, "seconds", Json::Int64{admin::kInvitationLifetimeS}), code);
+    if (!console.json) {
+        std::cerr << "Enter this code on " << request.name
+                  << ", which may then show every camera of this host: in the browser, or in \"lookhaven server add\""
+                     " with this host's address. It is valid once, for "
+                  << admin::kInvitationLifetimeS / 60 << " minutes, until a newer one is printed or shown.\n";
     }
 }
 
 std::string ReadPairText() {
     if (::isatty(STDIN_FILENO) != 0) {
-        std::cerr << "The line from lookhaven server pair on the other host: ";
+        std::cerr
+            << "The line from lookhaven server pair on the other host, or its code from lookhaven server invite: ";
     }
     std::string line;
     std::getline(std::cin, line);
@@ -114,35 +129,48 @@ std::string ConnectionProblem(const RecordingServer& server, const std::string& 
                                     server.id, " --address ADDRESS --port PORT");
 }
 
-void Add(const Console& console, const Request& request) {
-    const PairOffer offer = ParsePairText(ReadPairText());
+admin::PairingOutcome AddByLine(store::Store& store, const std::string& line, const Request& request) {
+    const PairOffer offer = ParsePairText(line);
     remote::CertificateName(offer.certificate);  // throws before anything is stored
-    store::Store store = console.OpenStore();
-    RecordingServers servers(store);
     RecordingServer server{.name = request.name,
                            .address = request.address.empty() ? offer.address : request.address,
-                           .port = offer.port,
+                           .port = request.change.port.value_or(offer.port),
                            .certificate = remote::CertificatesIn(offer.certificate)};
-    server.id = servers.Pair(server, offer.secret, offer.cameras);
-    const std::string problem = ConnectionProblem(server, offer.secret);
+    server = admin::AddServer(store, {}, server, offer.secret, offer.cameras, false);
+    return {server, offer.secret, offer.cameras.size()};
+}
+
+admin::PairingOutcome AddByCode(store::Store& store, const std::string& line, const Request& request) try {
+    const remote::PairingCode code = remote::ParsePairingCode(line);
+    if (request.address.empty()) {
+        throw Failure(kUsage, "with a code, --address says where the other host is reached");
+    }
+    return admin::PairByCode(store, {}, request.name, request.address, request.change.port.value_or(kDefaultPort),
+                             code);
+} catch (const remote::InvalidPairingCode& error) {
+    throw Failure(kDataError, error.what(), "; the line from lookhaven server pair begins with ", kPairTextPrefix);
+} catch (const admin::CannotPair& error) {
+    throw Failure(kUnavailable, error.what());
+}
+
+void Add(const Console& console, const Request& request) {
+    const std::string line = ReadPairText();
+    store::Store store = console.OpenStore();
+    const auto add = line.starts_with(kPairTextPrefix) ? AddByLine : AddByCode;
+    const auto [server, secret, cameras] = add(store, line, request);
+    const std::string problem = ConnectionProblem(server, secret);
     Json::Value data = ToData(server);
     data["answers"] = problem.empty();
-    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", offer.cameras.size(),
-                   " cameras.", problem);
+    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", cameras, " cameras.", problem);
 }
 
 // Secret, certificate and cameras stay.
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    RecordingServers servers(store);
-    RecordingServer server = Require(servers.Find(request.id), "there is no server ", request.id);
-    server.name = request.change.name.value_or(server.name);
-    server.enabled = request.change.enabled.value_or(server.enabled);
-    server.address = request.change.address.value_or(server.address);
-    server.port = request.change.port.value_or(server.port);
-    servers.Update(server);
+    const RecordingServer server = admin::SetServer(store, {}, request.id, request.change);
     const bool is_tried = server.enabled && !server.address.empty();
-    const std::string problem = is_tried ? ConnectionProblem(server, servers.FindSecret(server.id)) : "";
+    const std::string problem =
+        is_tried ? ConnectionProblem(server, RecordingServers(store).FindSecret(server.id)) : "";
     Json::Value data = ToData(server);
     data["answers"] = is_tried && problem.empty();
     console.Answer(data, "Changed server ", server.name, ".", problem);
@@ -174,19 +202,20 @@ std::string DenialsText(const Json::Value& denials) {
     return text;
 }
 
-// A new pairing gives the cameras other ids, so what was denied would be allowed by it.
+Json::Value DenialsData(const admin::ServerLoss& loss) {
+    return Array(loss.denials, [](const auto& denial) { return ToData(denial); });
+}
+
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    RecordingServers servers(store);
-    const Json::Value denials = Array(servers.Denials(request.id), [](const auto& denial) { return ToData(denial); });
-    const std::string text = DenialsText(denials);
-    if (!denials.empty() && !request.yes) {
-        throw Failure(kDataError, "removing this server also removes what users are denied of it (", text,
+    try {
+        const Json::Value denials = DenialsData(admin::RemoveServer(store, {}, request.id, {}, request.yes));
+        console.Answer(Object("id", request.id, "denials", denials), "Removed server ", request.id, " with its cameras",
+                       denials.empty() ? "" : ", and what users were denied of it: ", DenialsText(denials), ".");
+    } catch (const admin::RemovesDenials& refusal) {
+        throw Failure(kDataError, refusal.what(), " (", DenialsText(DenialsData(refusal.Loss())),
                       "); add --yes to confirm");
     }
-    servers.Remove(request.id);
-    console.Answer(Object("id", request.id, "denials", denials), "Removed server ", request.id, " with its cameras",
-                   denials.empty() ? "" : ", and what users were denied of it: ", text, ".");
 }
 
 void ListCameras(const Console& console) {
@@ -200,7 +229,6 @@ void ListCameras(const Console& console) {
 
 void Refresh(const Console& console) {
     store::Store store = console.OpenStore();
-    RecordingServers servers(store);
     Json::Value data = Json::arrayValue;
     std::string failures;
     const auto note = [&](const RecordingServer& server, const std::string& failure) {
@@ -212,7 +240,8 @@ void Refresh(const Console& console) {
             continue;
         }
         try {
-            data.append(Object("id", server.id, "name", server.name, "new", servers.PutCameras(server.id, cameras)));
+            data.append(Object("id", server.id, "name", server.name, "new",
+                               admin::PutServerCameras(store, {}, server.id, cameras)));
         } catch (const std::exception& refusal) {
             note(server, refusal.what());
         }
@@ -233,11 +262,16 @@ void AddServer(CLI::App& program, const Console& console) {
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "This host's address for the other one (default: its host name)")
         .Option("--port", request.port, "This host's HTTPS port (default: 8443)", Satisfies(CLI::Range(1, 65535)));
+    group.Add("invite", "Likewise: prints a code to enter there, which is valid once, for ten minutes", Invite)
+        .Option("name", request.name, name, Required);
     group
-        .Add("add", "Reads the line of a host whose cameras are to be shown from standard input, also of a known host",
+        .Add("add",
+             "Reads the line or code of a host whose cameras are to be shown from standard input, also of a known host",
              Add)
         .Option("name", request.name, name, Required)
-        .Option("--address", request.address, "The other host's address (default: as in the line)");
+        .Option("--address", request.address, "The other host's address (default: as in the line)")
+        .Option("--port", request.change.port, "Its HTTPS port (default: as in the line; with a code, 8443)",
+                Satisfies(CLI::Range(1, 65535)));
     group.Add("set", "Changes where a host is reached, or what it is called, without pairing again", Change)
         .Option("id", request.id, "The host's id", Required)
         .Option("--name", request.change.name, name)

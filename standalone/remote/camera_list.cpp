@@ -9,6 +9,8 @@ namespace lookhaven::remote {
 
 namespace {
 
+constexpr const char* kNotUnderstood = "an answer that cannot be understood";
+
 // Throws Json::Exception for what is nested too deeply.
 Json::Value Parse(const std::string& text) {
     Json::CharReaderBuilder builder;
@@ -32,14 +34,20 @@ std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
     return cameras;
 }
 
-std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text) try {
+Json::Value DataInAnswer(const std::string& text) try {
     const Json::Value json = Parse(text);
     if (json.isObject() && json["data"].isObject() && json["data"]["camera"].isArray()) {
-        return CamerasIn(json["data"]["camera"]);
+        return json["data"];
     }
-    throw NoAnswer("an answer that cannot be understood");
+    throw NoAnswer(kNotUnderstood);
 } catch (const Json::Exception&) {
-    throw NoAnswer("an answer that cannot be understood");
+    throw NoAnswer(kNotUnderstood);
+}
+
+std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text) try {
+    return CamerasIn(DataInAnswer(text)["camera"]);
+} catch (const Json::Exception&) {
+    throw NoAnswer(kNotUnderstood);
 }
 
 }  // namespace lookhaven::remote

@@ -16,7 +16,11 @@ namespace lookhaven::remote {
 // type.
 std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list);
 
-// The cameras in what a host's VEXO.Pairing answers to Cameras. Throws NoAnswer for any other text.
+// The data of what a host's VEXO.Pairing answers, whose member "camera" is such a list. Throws NoAnswer for any other
+// text.
+Json::Value DataInAnswer(const std::string& text);
+
+// The cameras in it. Throws NoAnswer.
 std::vector<store::RemoteCamera> CamerasInAnswer(const std::string& text);
 
 }  // namespace lookhaven::remote

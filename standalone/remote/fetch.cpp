@@ -43,4 +43,11 @@ std::string FetchJson(const Host& host, const Request& request) {
     return std::move(sink.text);
 }
 
+std::string FetchCertificates(const std::string& address, int port) {
+    std::string pem;
+    reinterpret_cast<decltype(&LookhavenFetchCertificates)>(FindInLibrary("LookhavenFetchCertificates"))(address, port,
+                                                                                                         pem);
+    return pem;
+}
+
 }  // namespace lookhaven::remote

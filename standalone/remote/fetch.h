@@ -29,7 +29,15 @@ struct Request {
 
 // The host does not answer, shows another certificate, refuses, or answers with something else than what was asked for.
 struct NoAnswer : std::runtime_error {
-    using std::runtime_error::runtime_error;
+    explicit NoAnswer(const std::string& why, long status_of_answer = 0)
+        : std::runtime_error(why),
+          status(status_of_answer) {}
+    const long status;  // of HTTP; 0 where no answer came
+};
+
+// Who answers shows another certificate, or one that has expired; the request was not sent.
+struct WrongCertificate : NoAnswer {
+    using NoAnswer::NoAnswer;
 };
 
 // Takes an answer as it comes. What returns false ends it.
@@ -52,5 +60,10 @@ void FetchLiveView(const Host& host, const Request& request, Sink& sink);
 // The JSON text that the host answers with, 1 MiB at most, within ten seconds. Throws as above, NoAnswer also for an
 // answer that is cut off.
 std::string FetchJson(const Host& host, const Request& request);
+
+// The certificates that the web server there shows, its own first, in PEM. Nobody has said whether they are the right
+// ones: that is for the caller to judge, and nothing but the handshake of TLS goes there. Throws NoAnswer where there
+// is no such server; std::runtime_error when the library cannot be loaded.
+std::string FetchCertificates(const std::string& address, int port);
 
 }  // namespace lookhaven::remote

@@ -109,11 +109,12 @@ class Transfer {
         }
         if (!has_begun_ && !is_refused_by_sink_) {
             if (result == CURLE_PEER_FAILED_VERIFICATION) {
-                throw NoAnswer("its certificate is not the one that it was paired with, or has expired");
+                throw WrongCertificate("its certificate is not the one that it was paired with, or has expired");
             }
             throw NoAnswer(!refusal_.empty()     ? refusal_
                            : problem_[0] != '\0' ? problem_.data()
-                                                 : ::curl_easy_strerror(result));
+                                                 : ::curl_easy_strerror(result),
+                           Status());
         }
         return result == CURLE_OK;
     }
@@ -128,17 +129,22 @@ class Transfer {
 
     // Throws NoAnswer.
     void RequireExpected() const {
-        long status = 0;
-        ::curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
+        const long status = Status();
         if (status == 401 || status == 403) {
-            throw NoAnswer(WhyNotAdmitted());
+            throw NoAnswer(WhyNotAdmitted(), status);
         }
         if (status != 200) {
-            throw NoAnswer("it answers with status " + std::to_string(status));
+            throw NoAnswer("it answers with status " + std::to_string(status), status);
         }
         if (!IsOneOf(expected_.content_types, ContentType())) {
-            throw NoAnswer("its answer is not what was asked for");
+            throw NoAnswer("its answer is not what was asked for", status);
         }
+    }
+
+    long Status() const {
+        long status = 0;
+        ::curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
+        return status;
     }
 
     // What proves this host's identity is valid for a few minutes only.

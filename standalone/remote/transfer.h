@@ -19,3 +19,7 @@ extern "C" __attribute__((visibility("default"))) bool LookhavenFetch(const look
                                                                       const lookhaven::remote::Request& request,
                                                                       const lookhaven::remote::Expected& expected,
                                                                       lookhaven::remote::Sink& sink);
+
+// Appends to pem. Throws NoAnswer.
+extern "C" __attribute__((visibility("default"))) void LookhavenFetchCertificates(const std::string& address, int port,
+                                                                                  std::string& pem);

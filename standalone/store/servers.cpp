@@ -129,6 +129,13 @@ int AddRow(soci::session& sql, RecordingServer server, const std::string& secret
     return server.id;
 }
 
+// With the id of the one that it renews; 0 where there is none.
+RecordingServer Matched(soci::session& sql, RecordingServer server) {
+    const auto known = FetchOne<RecordingServer>(sql, "where name = :name", server.name);
+    server.id = known && known->address.empty() == server.address.empty() ? known->id : 0;
+    return server;
+}
+
 void UpdateRow(soci::session& sql, const RecordingServer& server, const std::optional<std::string>& secret) {
     RequireServer(sql, server.id);
     RequireValid(sql, server);
@@ -157,10 +164,8 @@ int RecordingServers::Pair(const RecordingServer& server, const std::string& sec
     RequireSecret(secret);
     return connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
-        const auto known = FetchOne<RecordingServer>(sql, "where name = :name", server.name);
-        RecordingServer paired = server;
-        if (known && known->address.empty() == server.address.empty()) {
-            paired.id = known->id;
+        RecordingServer paired = Matched(sql, server);
+        if (paired.id != 0) {
             UpdateRow(sql, paired, secret);
         } else {
             paired.id = AddRow(sql, server, secret);
@@ -168,6 +173,10 @@ int RecordingServers::Pair(const RecordingServer& server, const std::string& sec
         PutRows(sql, paired.id, cameras);
         return paired.id;
     });
+}
+
+void RecordingServers::RequirePairable(const RecordingServer& server) {
+    connection_.Write([&](soci::session& sql) { RequireValid(sql, Matched(sql, server)); });
 }
 
 void RecordingServers::Update(const RecordingServer& server, const std::optional<std::string>& secret) {

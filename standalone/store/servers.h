@@ -63,6 +63,8 @@ class RecordingServers {
     // is denied it, and one that is not among the cameras any more stays. Returns the id. Throws as Add; AlreadyExists
     // where the name is that of a host that connects to this one, and the other way round.
     int Pair(const RecordingServer& server, const std::string& secret, const std::vector<RemoteCamera>& cameras);
+    // Throws as Pair would for the record by itself, and stores nothing.
+    void RequirePairable(const RecordingServer& server);
     // Removes the server with its cameras and devices, and Denials(id) with them; their ids are not used again. Throws
     // NotFound.
     void Remove(int id);

@@ -30,8 +30,10 @@ def shape(value):
 
 
 def words(server):
-    """What stands for the words with a dollar sign: an event of the demo, the day around it, the mount, the setting and the account viewer."""
+    """What stands for the words with a dollar sign: what the examples refer to, as it is in the demo."""
     now = int(time.time())
+    server.cli("server", "add", "Itself", text=server.cli("server", "pair", "Other", "--address", "localhost", "--port", str(server.tls_port)))
+    hosts = server.request(call("VEXO.Server", "List"), "admin", {}).json["data"]["server"]
     accounts = server.request(call("VEXO.User", "List"), "admin", {}).json["data"]["user"]
     mounts = server.request(call("VEXO.Mount", "List"), "admin", {}).json["data"]["mount"]
     settings = server.request(call("VEXO.System", "Settings"), "admin", {}).json["data"]["setting"]
@@ -40,6 +42,7 @@ def words(server):
         "$ADMIN_PASSWORD": PASSWORDS["admin"].replace(" ", "+"),
         "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),
         "$MOUNT_REVISION": str(mounts[0]["revision"]),
+        "$SERVER_REVISION": str(hosts[1]["revision"]),
         "$REVISION": str(next(one["revision"] for one in accounts if one["name"] == "viewer")),
         "$EVENT": str(recorded_events(server, 1)[0]["id"]),
         "$FROM": str(now - 86400),

@@ -13,7 +13,7 @@ import time
 import unittest
 
 from api_test import call, play
-from installation import Installation, make_certificate, pairing_secret, pairing_token, wait_until
+from installation import PASSWORDS, Installation, make_certificate, pairing_secret, pairing_token, wait_until
 from parts import Parts
 
 
@@ -22,6 +22,7 @@ class HostileHost(http.server.BaseHTTPRequestHandler):
 
     content_type = "text/html"
     ahead_s = 0
+    asked = 0
     HEADERS = {
         "Set-Cookie": "id=chosen-by-another; Path=/",
         "X-Accel-Redirect": "/webapi?api=VEXO.Auth&version=1&method=Status",
@@ -31,6 +32,7 @@ class HostileHost(http.server.BaseHTTPRequestHandler):
     }
 
     def do_POST(self):
+        HostileHost.asked += 1
         self.send_response(200)
         for name, value in {"Content-Type": self.content_type, **self.HEADERS}.items():
             self.send_header(name, value)
@@ -181,6 +183,50 @@ class PairingTest(unittest.TestCase):
         self.assertEqual(self.relay(1, server=server).status, 502)
         self.watcher.cli("server", "remove", str(server))
         self.assertEqual(self.relay(1, server=server).status, 404)
+
+    def test_two_hosts_are_paired_by_a_code_that_is_typed(self):
+        def ask(host, method, **form):
+            return host.request(call("VEXO.Server", method), "admin", form)
+
+        def invite():
+            answer = ask(self.owner, "Invite", name="By code", reauth=PASSWORDS["admin"])
+            self.assertEqual(answer.status, 200, answer.body)
+            return answer.json["data"]["code"]
+
+        def pair(code, port=self.owner.tls_port, address="localhost"):
+            answer = ask(self.watcher, "Pair", name="By code", address=address, port=port, code=code, reauth=PASSWORDS["admin"])
+            return answer.json["data"]["server"] if answer.status == 200 else (answer.json["error"]["data"] or {"reason": answer.status})["reason"]
+
+        replaced, code = invite(), invite()
+        port, _ = self.enterContext(HostileHost.running())
+        HostileHost.asked = 0
+        for what, given, why in [
+            ("a typing error", (code[:-1] + ("0" if code[-1] != "0" else "1"),), 400),
+            ("nobody", (code, 1), "unreachable"),
+            ("a web server without TLS", (code, self.owner.port), "unreachable"),
+            ("no such name", (code, 1, "no-such-host.invalid"), "unreachable"),
+            ("another host", (code, self.watcher.tls_port), "certificate"),
+            ("somebody in between", (code, port), "certificate"),
+            ("the code before", (replaced,), "code"),
+        ]:
+            with self.subTest(what):
+                self.assertEqual(pair(*given), why)
+        self.assertEqual(HostileHost.asked, 0, "nothing is sent to another host")
+        server = pair(code.lower().replace("-", " "), address="127.0.0.1")
+        self.addCleanup(self.watcher.cli, "server", "remove", str(server["id"]), "--yes")
+        self.assertEqual({camera["idOnServer"] for camera in server["camera"]}, set(self.known()))
+        self.assertEqual(pair(code), "code", "it was used")
+        self.assertEqual(ask(self.watcher, "Check", id=server["id"]).json["data"], {"answers": True, "reason": ""})
+        wait_until(lambda: self.relay(1, server=server["id"]).status == 200, 15, "a picture of the new pairing")
+        said = json.loads(self.watcher.cli("server", "add", "By code", "--address", "localhost", "--port", str(self.owner.tls_port),
+                                           "--json", text=self.owner.cli("server", "invite", "By code")))
+        self.assertEqual((said["id"], said["answers"]), (server["id"], True), "renewed, by the command line")
+        watchers = [one for one in ask(self.owner, "List").json["data"]["server"] if one["name"] == "By code"]
+        self.assertEqual(len(watchers), 1)
+        self.assertIn("removed", ask(self.owner, "Remove", id=watchers[0]["id"], revision=watchers[0]["revision"]).json["data"])
+        self.assertIn("does not let this host in", ask(self.watcher, "Check", id=server["id"]).json["data"]["reason"])
+        log = "".join(path.read_text() for home in (self.owner.home, self.watcher.home) for path in (home / "log").iterdir())
+        self.assertNotIn(code, log)
 
     def test_a_hostile_host_steers_neither_web_server_nor_browser(self):
         port, certificate = self.enterContext(HostileHost.running())

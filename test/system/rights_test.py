@@ -67,6 +67,7 @@ Event.Download event={event}                                          E      E  
 Event.PlanExport cameralists={camera} from=-1d to=now                 E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Export cameralists={camera} from=-1d to=now                     E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Pairing.Cameras                                                       E      E     E       E     E    E       E        E      E       D
+Pairing.Accept                                                        M      M     M       M     M    M       M        M      M       M
 Picture.Get camera={camera}                                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Picture.At camera={camera} time_ms=now_ms                              E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Picture.At event={alert} kind=alert frame=0                           E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
@@ -76,6 +77,11 @@ POST Playback.Pause timestamp=1 on=true                               E      E  
 POST Playback.CheckOwner timestamp=1                                  E      E     N       N     N    N       N        N      N       E
 POST Playback.Stop timestamp=1                                        E      E     N       N     N    N       N        N      N       E
 Relay.Play server=2 camera={camera}                                   E      E     S/N     N     D/N  S/N     S/N      S/N    S/N     E
+POST Server.List                                                      E      E     F       F     F    F       F        F      D       E
+POST Server.Check id={server}                                         E      E     F       F     F    F       F        F      D/N     E
+POST Server.Invite name=x reauth=own                                  E      E     F       F     F    F       F        F      D       E
+POST Server.Pair name=x address=127.0.0.1 code=x                      E      E     F       F     F    F       F        F      B       E
+POST Server.Remove id={server} revision=1                             E      E     F       F     F    F       F        F      C/N     E
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D
 POST System.Status                                                    E      E     F       F     F    F       F        F      D       E
@@ -167,7 +173,7 @@ class RightsTest(unittest.TestCase):
         server.cli("user", "passwd", "ended", text="another secret")
         marks = server.request(call("VEXO.Event", "List", cameralists=2, kind="alert"), "manager").json["data"]["event"]
         cls.ids = {"camera": 2, "silent": 1, "map": 1, "door": 1, "group": 1, "mount": 1, "event": recorded_events(server, 2)[0]["id"],
-                   "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"],
+                   "alert": marks[0]["id"], "mjpeg": recorded_events(server, 1)[0]["id"], "server": 2,
                    "user": next(one["id"] for one in json.loads(server.cli("user", "list", "--json")) if one["name"] == "ended")}
 
     def ask(self, is_post, request, told, caller, **objects):

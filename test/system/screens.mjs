@@ -65,6 +65,7 @@ await visit(async (page, complaints) => {
     ["account", "accounts&open=2", ".rights"],
     ["storage", "storage", ".mount-card"],
     ["mount", "storage&open=1", ".form"],
+    ["hosts", "hosts", ".mount-card details"],
     ["system", "system", ".health-summary"],
     ["audit", "audit", ".audit-entry, .settings-state"],
   ]) {

@@ -11,6 +11,8 @@ class ScreensTest(unittest.TestCase):
     def test_every_screen(self):
         server = self.enterContext(Installation())
         wait_until(lambda: recorded_events(server, 1), 30, "an event of camera 1")
+        line = server.cli("server", "pair", "Head office", "--address", "localhost", "--port", str(server.tls_port))
+        server.cli("server", "add", "Warehouse", text=line)
         with Visit("screens.mjs", f"http://127.0.0.1:{server.port}/") as visit:
             for name, title, focus in [
                 ("log-in", "Log in", None),
@@ -36,6 +38,7 @@ class ScreensTest(unittest.TestCase):
                 ("account", "Accounts", None),
                 ("storage", "Storage", "Storage"),
                 ("mount", "Storage", None),
+                ("hosts", "Hosts", "Hosts"),
                 ("system", "System", "System"),
                 ("audit", "Audit log", "Audit log"),
             ]:

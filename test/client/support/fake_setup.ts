@@ -6,6 +6,7 @@ import type { CameraRecord } from "../../../client/src/wire/camera_setup";
 import type { DeviceRecord } from "../../../client/src/wire/devices";
 import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
+import type { HostRecord } from "../../../client/src/wire/hosts";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { UserRecord } from "../../../client/src/wire/accounts";
 import type { SettingRecord, SystemStatus } from "../../../client/src/wire/system";
@@ -21,6 +22,9 @@ const failed = (code: number, message: string, data: unknown = null): Answer => 
   error: { code, message, data },
 });
 
+/** A valid one. */
+export const kCode = "008J-4CT4-ANK7-F24S-04HM-ASW9-NF6Y-Z93N";
+
 export class FakeSetup {
   readonly camera: CameraRecord[] = [];
   readonly user: UserRecord[] = [];
@@ -28,6 +32,9 @@ export class FakeSetup {
   readonly group: GroupRecord[] = [];
   readonly emap: EmapRecord[] = [];
   readonly device: DeviceRecord[] = [];
+  readonly host: HostRecord[] = [];
+  /** Why no host is paired with, and why none answers; empty: they are, and do. */
+  whyNoHost = "";
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
   readonly setting: SettingRecord[] = [];
@@ -56,6 +63,11 @@ export class FakeSetup {
     "VEXO.Device.Set": (request) => this.#set("device", request),
     "VEXO.Emap.List": () => ok({ emap: this.emap }),
     "VEXO.Emap.Rename": ({ emap, ...rest }) => this.#set("emap", { ...rest, id: Number(emap) } as Request),
+    "VEXO.Server.List": () => ok({ server: this.host, centralManagement: false }),
+    "VEXO.Server.Check": () => ok({ answers: !this.whyNoHost, reason: this.whyNoHost }),
+    "VEXO.Server.Invite": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : ok({ code: kCode, seconds: 600 })),
+    "VEXO.Server.Pair": (request) => (this.whyNoHost ? failed(502, "no", { reason: this.whyNoHost }) : this.#addHost(request)),
+    "VEXO.Server.Remove": (request) => this.#removeHost(request),
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
     "VEXO.System.Status": () => ok(this.status),
     "VEXO.System.Settings": () => ok({ setting: this.setting }),
@@ -68,6 +80,21 @@ export class FakeSetup {
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
     Object.assign(record, changes, { revision: record.revision + 1 });
     return this.#note(kind, request, ok({ [kind]: record }));
+  }
+
+  #addHost(request: Request): Answer {
+    const { name, address, port, reauth } = request as unknown as HostRecord & { reauth: string };
+    if (reauth !== "right") return failed(403, "The password is wrong.");
+    const record = { id: 9, revision: 1, name, address, port, enabled: true, camera: [{ id: 7, idOnServer: 1, name: "Yard" }], denial: [] };
+    this.host.push(record);
+    return this.#note("Server.Pair", request, ok({ server: record }));
+  }
+
+  #removeHost(request: Request): Answer {
+    const { id, confirm } = request as unknown as { id: number; confirm: boolean };
+    const at = this.host.findIndex((one) => one.id === id);
+    if (this.host[at]!.denial.length > 0 && !confirm) return ok({ confirm: this.host[at] });
+    return this.#note("Server.Remove", request, ok({ removed: this.host.splice(at, 1)[0] }));
   }
 
   #setSetting(request: Request): Answer {

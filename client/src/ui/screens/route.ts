@@ -13,7 +13,7 @@ import type { Camera } from "../../wire/server";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
 export const kSettingsSections = [
-  "cameras", "groups", "maps", "devices", "accounts", "storage", "system", "audit",
+  "cameras", "groups", "maps", "devices", "accounts", "storage", "hosts", "system", "audit",
 ] as const;
 export type SettingsSection = (typeof kSettingsSections)[number];
 

@@ -12,6 +12,7 @@ import { DevicesPage } from "../settings/devices/devices_page";
 import { GroupPage } from "../settings/groups/group_page";
 import { GroupsPage } from "../settings/groups/groups_page";
 import { MapsPage } from "../settings/maps/maps_page";
+import { HostsPage } from "../settings/hosts/hosts_page";
 import { MountPage } from "../settings/storage/mount_page";
 import { StoragePage } from "../settings/storage/storage_page";
 import { SystemPage } from "../settings/system/system_page";
@@ -31,6 +32,7 @@ const kSections: Record<MenuSection, [label: string, icon: IconName]> = {
   maps: ["Maps", "map"],
   accounts: ["Accounts", "people"],
   storage: ["Storage", "storage"],
+  hosts: ["Hosts", "hosts"],
   system: ["System", "system"],
   audit: ["Audit log", "audit"],
 };
@@ -42,6 +44,7 @@ const kLists: Record<SettingsSection, new (context: PageContext) => Page> = {
   devices: DevicesPage,
   accounts: AccountsPage,
   storage: StoragePage,
+  hosts: HostsPage,
   system: SystemPage,
   audit: AuditPage,
 };

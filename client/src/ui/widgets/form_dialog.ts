@@ -69,7 +69,7 @@ export function openDialog(host: HTMLElement, { title, content, submit, attempt 
 /** Asks users for their password again; `attempt` gets it. */
 export function openReauthDialog(
   host: HTMLElement,
-  form: Omit<DialogForm, "attempt"> & { attempt(password: string): Promise<void> },
+  form: Omit<DialogForm, "attempt"> & { attempt(password: string): Promise<string | void> },
 ): Promise<boolean> {
   const password = secretField("Your own password");
   return openDialog(host, {

@@ -4,7 +4,7 @@
 
 import type { Page } from "playwright-core";
 import { kNothingDenied } from "../../../../client/src/ui/settings/accounts/rights";
-import { cameraRecord } from "../../support/fake_setup";
+import { cameraRecord, kCode } from "../../support/fake_setup";
 import { hasBrowser, ServedClient } from "../../support/served_client";
 
 describe.skipIf(!hasBrowser)("in Chromium", () => {
@@ -126,6 +126,63 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.getByText("The camera is saved.").waitFor();
     expect(setup.asked).toEqual([["camera", { id: 2, revision: 1, name: "Gate north" }]]);
     expect(await page.getByLabel("Name").inputValue(), "typed while it was being saved").toBe("Gate north 2");
+  }, 30_000);
+
+  test("a host shows a code, and another is added by it, away, and removed with what goes along", async () => {
+    setup.host.splice(0, Infinity);
+    setup.whyNoHost = "";
+    const page = await open("hosts");
+    await page.getByText("No other host yet.").waitFor();
+    await page.getByRole("button", { name: "Show a code" }).click();
+    const dialog = page.getByRole("dialog");
+    await dialog.getByLabel("Name of the other host").fill("Office");
+    await dialog.getByLabel("Your own password").fill("wrong");
+    await page.keyboard.press("Enter");
+    await dialog.getByText("The password is wrong.").waitFor();
+    await dialog.getByLabel("Your own password").fill("right");
+    await page.keyboard.press("Enter");
+    expect(await page.getByRole("group", { name: "Code" }).textContent()).toBe(kCode.replaceAll("-", ""));
+    await page.keyboard.press("Escape");
+    await page.getByRole("button", { name: "Add a host" }).first().click();
+    await dialog.getByLabel("Name", { exact: true }).fill("Warehouse");
+    await dialog.getByLabel("Address").fill("https://nvr2.example:443/");
+    const add = async (code: string, said: RegExp) => {
+      await dialog.getByLabel("Code").fill(code);
+      await dialog.getByRole("button", { name: "Add the host" }).click();
+      await dialog.getByText(said).waitFor();
+    };
+    await add(kCode, /enter your password/);
+    await dialog.getByLabel("Your own password").fill("wrong");
+    await add(kCode, /The password is wrong/);
+    await dialog.getByLabel("Your own password").fill("right");
+    await add(kCode.replace("Z", "Y"), /typing error/);
+    const refusals = [
+      ["unreachable", /No Lookhaven host answers/],
+      ["certificate", /was not sent/],
+      ["code", /valid once/],
+      ["tooMany", /again in a minute/],
+    ] as const;
+    for (const [why, said] of refusals) {
+      setup.whyNoHost = why;
+      await add(kCode, said);
+    }
+    expect(await dialog.getByLabel("Address").inputValue(), "what was typed stays").toBe("https://nvr2.example:443/");
+    setup.whyNoHost = "";
+    await dialog.getByRole("button", { name: "Add the host" }).click();
+    await page.locator(".mount-head", { hasText: "answers" }).waitFor();
+    await page.getByText("central management is off").waitFor();
+    const asked = { name: "Warehouse", address: "nvr2.example", port: 443, code: kCode, reauth: "right" };
+    expect(setup.asked).toEqual([["Server.Pair", asked]]);
+    setup.whyNoHost = "its clock is 5 minutes behind";
+    await page.evaluate(() => location.reload());
+    await page.getByText("Its clock is 5 minutes behind.").waitFor();
+    await page.getByRole("button", { name: "Remove Warehouse" }).click();
+    setup.host[0]!.denial.push({ user: "guard", kind: "camera", id: 7 });
+    await dialog.getByRole("button", { name: "Remove", exact: true }).click();
+    await dialog.getByText("guard: Yard").waitFor();
+    expect(setup.host.length, "nothing that was not seen goes").toBe(1);
+    await dialog.getByRole("button", { name: "Remove", exact: true }).click();
+    await page.getByText("No other host yet.").waitFor();
   }, 30_000);
 
   test("the order of the cameras changes with keys and by dragging, and is stored once", async () => {

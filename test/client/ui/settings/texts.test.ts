@@ -6,6 +6,7 @@ import { actionText, changesOf } from "../../../../client/src/ui/settings/audit/
 import { addressProblem, withPath } from "../../../../client/src/ui/settings/cameras/address";
 import { kFirstPlan, painted, recordedText, weekText } from "../../../../client/src/ui/settings/cameras/plan";
 import { differences, isSame, merged } from "../../../../client/src/ui/settings/merge";
+import { denialsText, hostAndPort, ownAddress } from "../../../../client/src/ui/settings/hosts/host_text";
 import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/accounts/rights";
 import { commandOf, linesOf, summaryText } from "../../../../client/src/ui/settings/system/system_text";
 import { limitsEffect } from "../../../../client/src/ui/settings/storage/storage_text";
@@ -78,6 +79,28 @@ test("amounts change their unit where four digits would be needed", () => {
   expect([0.9, 1, 29.9, 30, 90, 4000].map(daysText)).toEqual(["less than a day", "1 day", "29 days", "4 weeks", "2 months", "more than ten years"]);
   const effect = limitsEffect({ limitBytes: 5e11, limitDays: 20 }, { perDay: 1e11, used: 2e11, free: 9e11 });
   expect(effect.replaceAll("\u00a0", " ")).toContain("about 5 days of footage, 500 GB");
+});
+
+test.each([
+  ["nvr2.example", 8443, "nvr2.example", 8443],
+  [" https://nvr2.example:443/#settings=hosts ", 8443, "nvr2.example", 443],
+  ["192.0.2.1:1", 8443, "192.0.2.1", 1],
+  ["[2001:db8::1]:443", null, "2001:db8::1", 443],
+  ["[2001:db8::1]", 7, "2001:db8::1", 7],
+  ["2001:db8::1", null, "2001:db8::1", 8443],
+])("the address %s with the port %s leads to %s, %s", (typed, port, address, expected) => {
+  expect(hostAndPort(typed, port)).toEqual({ address, port: expected });
+});
+
+test("a name that leads nowhere else is no address for another host", () => {
+  const names = ["localhost", "127.0.0.1", "[::1]", "nvr.example", "[2001:db8::1]"];
+  expect(names.map((hostname) => ownAddress({ hostname }))).toEqual([null, null, null, "nvr.example", "2001:db8::1"]);
+});
+
+test("what goes with a host is told by user", () => {
+  const camera = [{ id: 4, idOnServer: 1, name: "Yard" }];
+  const denial = [["ann", "camera", 4], ["bob", "camera", 5], ["ann", "ioModule", 2]].map(([user, kind, id]) => ({ user, kind, id }));
+  expect(denialsText({ camera, denial } as never)).toBe("ann: Yard, I/O module 2; bob: camera 5");
 });
 
 test.each([

@@ -7,7 +7,9 @@ import { yesNo } from "../../widgets/text";
 import { weekText } from "../cameras/plan";
 
 /** Where the user knows it by another name. */
-const kAreas: Record<string, string> = { user: "account", group: "camera group", emap: "map", io: "I/O module", pos: "POS terminal" };
+const kAreas: Record<string, string> = {
+  user: "account", group: "camera group", emap: "map", io: "I/O module", pos: "POS terminal", server: "host",
+};
 const kVerbs: Record<string, string> = {
   add: "added",
   set: "changed",
@@ -16,6 +18,9 @@ const kVerbs: Record<string, string> = {
   place: "items placed",
   changePassword: "password changed",
   endSessions: "sessions ended",
+  admit: "may show cameras of this one",
+  invite: "invited by a code",
+  cameras: "cameras read anew",
 };
 
 /** "camera.add": "Camera added". */

@@ -1,0 +1,99 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/invitation.h"
+
+#include "standalone/admin/change.h"
+#include "standalone/admin/servers.h"
+#include "standalone/base/json_text.h"
+#include "standalone/remote/pairing_code.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/settings.h"
+#include "standalone/store/transaction.h"
+#include "standalone/store/users.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+// Its value is the invitation as JSON; empty once it was accepted.
+constexpr const char* kInvitationSetting = "pairing_invitation";
+
+[[noreturn]] void Refuse() {
+    throw InvalidInvitation("wrong or expired pairing code");
+}
+
+// The one that is valid. Throws InvalidInvitation.
+Json::Value FindInvitation(store::Store& store, const base::BootTime& now) {
+    Json::Value invitation = FromText(store::Settings(store).Find(kInvitationSetting).value_or(""));
+    if (!invitation.isObject() || invitation["boot"] != now.boot ||
+        now.seconds - invitation["given"].asInt64() >= kInvitationLifetimeS) {
+        Refuse();
+    }
+    return invitation;
+}
+
+// The same, where the secret belongs to it.
+Json::Value FindInvitation(store::Store& store, std::string_view secret, const base::BootTime& now) {
+    Json::Value invitation = FindInvitation(store, now);
+    if (invitation["digest"] != store::Digest(secret)) {
+        Refuse();
+    }
+    return invitation;
+}
+
+// Whoever asked for the code makes the pairing, from where it was typed.
+Actor ActorOf(store::Store& store, const Json::Value& invitation, const std::string& address) {
+    Actor actor;
+    actor.user_id = invitation["user"].asInt();
+    actor.address = address;
+    if (actor.user_id != 0) {
+        const auto user = store::Users(store).Find(actor.user_id);
+        actor.name = user ? user->name : "";
+    }
+    return actor;
+}
+
+}  // namespace
+
+std::string Invite(store::Store& store, const Actor& actor, const std::string& name,
+                   const remote::CertificateFacts& certificate, const base::BootTime& now) {
+    const remote::PairingCode code{remote::CertificateMark(certificate), store::RandomHex(remote::kPairingSecretBytes)};
+    Apply(store, actor, [&] {
+        store::RecordingServer watcher;
+        watcher.name = name;
+        store::RecordingServers(store).RequirePairable(watcher);
+        Json::Value invitation;
+        invitation["digest"] = store::Digest(code.secret);
+        invitation["boot"] = now.boot;
+        invitation["given"] = Json::Int64{now.seconds};
+        invitation["user"] = actor.user_id;
+        invitation["name"] = name;
+        store::Settings(store).Set(kInvitationSetting, base::OneLineJson(invitation));
+        Json::Value after;
+        after["minutes"] = Json::Int64{kInvitationLifetimeS / 60};
+        return Change{"server.invite", name, {}, after};
+    });
+    return remote::ToText(code);
+}
+
+void RequireInvitation(store::Store& store, const base::BootTime& now) {
+    FindInvitation(store, now);
+}
+
+std::string AcceptInvitation(store::Store& store, std::string_view secret, const std::string& address,
+                             const base::BootTime& now) {
+    FindInvitation(store, secret, now);  // whoever guesses locks nothing
+    std::string shared;
+    try {
+        store::InTransaction(store, [&] {
+            store::Users(store).Lock();
+            const Json::Value invitation = FindInvitation(store, secret, now);
+            shared = AdmitServer(store, ActorOf(store, invitation, address), invitation["name"].asString()).secret;
+            store::Settings(store).Set(kInvitationSetting, "");
+        });
+    } catch (const Forbidden&) {
+        throw InvalidInvitation("the pairing code of an account that is no manager any more");
+    }
+    return shared;
+}
+
+}  // namespace lookhaven::admin

@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/pair_by_code.h"
+
+#include "standalone/admin/servers.h"
+#include "standalone/base/host_name.h"
+#include "standalone/remote/camera_list.h"
+#include "standalone/remote/certificate_loader.h"
+#include "standalone/remote/fetch.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+using Reason = CannotPair::Reason;
+
+constexpr long kForbidden = 403;
+constexpr long kTooMany = 429;
+
+CannotPair Failed(Reason why) {
+    switch (why) {
+    case Reason::kUnreachable:
+        return {why, "no host that can be paired by a code answers at this address and port"};
+    case Reason::kCertificate:
+        return {why,
+                "what answers at this address is not the host that shows the code: its certificate is another one, "
+                "or has expired"};
+    case Reason::kCode:
+        return {why, "the code is not valid there: it is used up, older than ten minutes, or replaced by a newer one"};
+    case Reason::kTooMany:
+        return {why, "the other host takes no code from here now, after too many attempts; try again in a minute"};
+    }
+    throw std::logic_error("an unknown reason");
+}
+
+// Of the host that has the code, and of nobody else.
+std::string FetchRightCertificates(const std::string& address, int port, const remote::PairingCode& code) {
+    std::string certificates;
+    try {
+        certificates = remote::FetchCertificates(address, port);
+    } catch (const remote::NoAnswer&) {
+        throw Failed(Reason::kUnreachable);
+    }
+    try {
+        if (remote::CertificateMark(remote::LoadAndReadCertificate(certificates)) == code.certificate) {
+            return certificates;
+        }
+    } catch (const remote::InvalidCertificate&) {
+        // it shows none
+    }
+    throw Failed(Reason::kCertificate);
+}
+
+// The server's own one, without those of its issuers, which may have issued others.
+std::string FirstOf(const std::string& certificates) {
+    constexpr std::string_view kEnd = "-----END CERTIFICATE-----\n";
+    return certificates.substr(0, certificates.find(kEnd) + kEnd.size());
+}
+
+struct Offer {
+    std::string secret;
+    std::vector<store::RemoteCamera> cameras;
+};
+
+Offer Accept(const store::RecordingServer& server, const remote::PairingCode& code) {
+    try {
+        const Json::Value data = remote::DataInAnswer(
+            remote::FetchJson({server.address, server.port, FirstOf(server.certificate)},
+                              {"api=VEXO.Pairing&version=1&method=Accept", "", "code=" + code.secret}));
+        return {data["secret"].asString(), remote::CamerasIn(data["camera"])};
+    } catch (const remote::WrongCertificate&) {
+        throw Failed(Reason::kCertificate);
+    } catch (const remote::InvalidCertificate&) {
+        throw Failed(Reason::kCertificate);
+    } catch (const remote::NoAnswer& refusal) {
+        throw Failed(refusal.status == kForbidden ? Reason::kCode
+                     : refusal.status == kTooMany ? Reason::kTooMany
+                                                  : Reason::kUnreachable);
+    } catch (const Json::Exception&) {
+        throw Failed(Reason::kUnreachable);
+    }
+}
+
+}  // namespace
+
+PairingOutcome PairByCode(store::Store& store, const Actor& actor, const std::string& name, const std::string& address,
+                          int port, const remote::PairingCode& code) {
+    RequireManager(store, actor);
+    if (!base::IsHost(address) || port < 1 || port > 65'535) {
+        throw store::InvalidRecord("a server is reached by a host name or address, and a port from 1 to 65535");
+    }
+    store::RecordingServer server{.name = name, .address = address, .port = port};
+    server.certificate = FetchRightCertificates(address, port, code);
+    store::RecordingServers(store).RequirePairable(server);
+    const Offer offer = Accept(server, code);
+    return {AddServer(store, actor, server, offer.secret, offer.cameras, true), offer.secret, offer.cameras.size()};
+}
+
+}  // namespace lookhaven::admin

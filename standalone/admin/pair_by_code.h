@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Pairs this host with one whose cameras it is to show, by the code that is shown there.
+#pragma once
+
+#include <stdexcept>
+#include <string>
+
+#include "standalone/admin/actor.h"
+#include "standalone/remote/pairing_code.h"
+#include "standalone/store/servers.h"
+
+namespace lookhaven::admin {
+
+// Nothing was changed here. Whoever may pair can name any address that this machine reaches, so the text says no more
+// of what answers there than the reason.
+class CannotPair : public std::runtime_error {
+  public:
+    enum class Reason {
+        kUnreachable,  // no web server with TLS, or one that does not know how to pair by a code
+        kCertificate,  // it shows another certificate, or one that has expired
+        kCode,         // wrong, used, expired, or replaced by a newer one
+        kTooMany,      // too many codes were tried there from this host's network within a minute
+    };
+
+    CannotPair(Reason why, const std::string& text) : std::runtime_error(text), why_(why) {}
+    Reason Why() const { return why_; }
+
+  private:
+    Reason why_;
+};
+
+struct PairingOutcome {
+    store::RecordingServer server;
+    std::string secret;  // that both hosts share
+    std::size_t cameras = 0;
+};
+
+// Connects to the address, compares the certificate with the code before anything else is sent, and stores the host
+// with its cameras under that name, as AddServer does, with central management on. Blocks for 20 seconds at most.
+// Throws CannotPair, and as AddServer does; for a name or address that cannot be stored, before the code is used up.
+PairingOutcome PairByCode(store::Store& store, const Actor& actor, const std::string& name, const std::string& address,
+                          int port, const remote::PairingCode& code);
+
+}  // namespace lookhaven::admin

@@ -1,0 +1,160 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/servers.h"
+
+#include <algorithm>
+#include <iterator>
+
+#include "standalone/admin/change.h"
+#include "standalone/admin/settings.h"
+#include "standalone/store/secret.h"
+#include "standalone/store/transaction.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+using store::RecordingServer;
+using store::RecordingServers;
+
+constexpr std::size_t kSecretBytes = 32;
+
+RecordingServer RequireServer(store::Store& store, int id) {
+    std::optional<RecordingServer> server = RecordingServers(store).Find(id);
+    if (!server) {
+        throw store::NotFound("there is no server " + std::to_string(id));
+    }
+    return *std::move(server);
+}
+
+Json::Value Audited(const RecordingServer& server) {
+    Json::Value record = ServerRecord(server);
+    record.removeMember("revision");
+    return record;
+}
+
+// Null where there is none of that name.
+Json::Value AuditedByName(store::Store& store, const std::string& name) {
+    const std::vector<RecordingServer> all = RecordingServers(store).List();
+    const auto found = std::ranges::find(all, name, &RecordingServer::name);
+    return found == all.end() ? Json::Value() : Audited(*found);
+}
+
+std::vector<store::RemoteCamera> CamerasOf(store::Store& store, int id) {
+    std::vector<store::RemoteCamera> cameras;
+    std::ranges::copy_if(RecordingServers(store).ListCameras(), std::back_inserter(cameras),
+                         [id](const store::RemoteCamera& camera) { return camera.server_id == id; });
+    return cameras;
+}
+
+// {"cameras": ["Yard (4)"]}, with their ids here.
+Json::Value AuditedCameras(store::Store& store, int id) {
+    Json::Value record;
+    record["cameras"] = Json::arrayValue;
+    for (const store::RemoteCamera& camera : CamerasOf(store, id)) {
+        record["cameras"].append(Named(camera.name, camera.id));
+    }
+    return record;
+}
+
+// A secret is told of, not told.
+Change Paired(const char* action, const RecordingServer& server, const Json::Value& before) {
+    Change change{action, Named(server.name, server.id), before, Audited(server)};
+    change.after["secret"] = "new";
+    return change;
+}
+
+}  // namespace
+
+Json::Value ServerRecord(const RecordingServer& server) {
+    Json::Value json;
+    json["id"] = server.id;
+    json["name"] = server.name;
+    json["address"] = server.address;
+    json["port"] = server.port;
+    json["enabled"] = server.enabled;
+    json["revision"] = Json::Int64{RevisionOf(json)};
+    return json;
+}
+
+NewPairing AdmitServer(store::Store& store, const Actor& actor, const std::string& name) {
+    NewPairing made;
+    made.server.name = name;
+    Apply(store, actor, [&] {
+        made.secret = store::RandomHex(kSecretBytes);
+        const Json::Value before = AuditedByName(store, name);
+        made.server.id = RecordingServers(store).Pair(made.server, made.secret, {});
+        return Paired("server.admit", made.server, before);
+    });
+    return made;
+}
+
+RecordingServer AddServer(store::Store& store, const Actor& actor, RecordingServer server, const std::string& secret,
+                          const std::vector<store::RemoteCamera>& cameras, bool shows_cameras) {
+    store::InTransaction(store, [&] {
+        Apply(store, actor, [&] {
+            const Json::Value before = AuditedByName(store, server.name);
+            server.id = RecordingServers(store).Pair(server, secret, cameras);
+            Change change = Paired("server.add", server, before);
+            change.after["cameras"] = static_cast<Json::UInt64>(cameras.size());
+            return change;
+        });
+        if (shows_cameras) {
+            SetSetting(store, actor, kCentralManagement, {}, true);
+        }
+    });
+    return server;
+}
+
+int PutServerCameras(store::Store& store, const Actor& actor, int id, const std::vector<store::RemoteCamera>& cameras) {
+    int added = 0;
+    Apply(store, actor, [&] {
+        const RecordingServer server = RequireServer(store, id);
+        const Json::Value before = AuditedCameras(store, id);
+        added = RecordingServers(store).PutCameras(id, cameras);
+        return Change{"server.cameras", Named(server.name, id), before, AuditedCameras(store, id)};
+    });
+    return added;
+}
+
+RecordingServer SetServer(store::Store& store, const Actor& actor, int id, const ServerChange& change) {
+    RecordingServer server;
+    Apply(store, actor, [&] {
+        const RecordingServer before = RequireServer(store, id);
+        server = before;
+        server.name = change.name.value_or(server.name);
+        server.enabled = change.enabled.value_or(server.enabled);
+        server.address = change.address.value_or(server.address);
+        server.port = change.port.value_or(server.port);
+        RecordingServers(store).Update(server);
+        return Change{"server.set", Named(server.name, id), Audited(before), Audited(server)};
+    });
+    return server;
+}
+
+ServerLoss LossOf(store::Store& store, int id) {
+    return {CamerasOf(store, id), RecordingServers(store).Denials(id)};
+}
+
+ServerLoss RemoveServer(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,
+                        bool confirmed) {
+    ServerLoss loss;
+    Apply(store, actor, [&] {
+        const RecordingServer server = RequireServer(store, id);
+        RequireCurrent(ServerRecord(server), seen);
+        loss = LossOf(store, id);
+        if (!loss.denials.empty() && !confirmed) {
+            throw RemovesDenials(loss);
+        }
+        RecordingServers(store).Remove(id);
+        Change change{"server.remove", Named(server.name, id), Audited(server), {}};
+        change.before["cameras"] = static_cast<Json::UInt64>(loss.cameras.size());
+        for (const store::ServerDenial& denial : loss.denials) {
+            const char* kind = denial.kind == store::EmapItemType::kCamera ? "camera " : "I/O module ";
+            change.before["denied"].append(denial.user + ": " + kind + std::to_string(denial.id));
+        }
+        return change;
+    });
+    return loss;
+}
+
+}  // namespace lookhaven::admin
