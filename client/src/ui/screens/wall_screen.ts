@@ -14,7 +14,7 @@ import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
 import { keepTrying } from "./keep_trying";
-import { openCamera, showCamera, showWall } from "./route";
+import { openCamera, settingsAddress, showCamera, showWall } from "./route";
 import { Screen } from "./screen";
 import type { Session } from "./session";
 
@@ -163,5 +163,5 @@ export class WallScreen extends Screen {
 }
 
 function settingsLink({ isManager }: CameraList, text: string): HTMLElement[] {
-  return isManager ? [element("a", { href: "#settings=cameras" }, text)] : [];
+  return isManager ? [element("a", { class: "button", href: settingsAddress("cameras") }, text)] : [];
 }
