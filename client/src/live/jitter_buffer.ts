@@ -63,7 +63,7 @@ export class JitterBuffer {
   pull(output: Float32Array[]): number | null {
     for (const channel of output) channel.fill(0);
     const bufferedMs = this.#bufferedMs();
-    if (!this.#playing) this.#playing = bufferedMs > 0 && bufferedMs >= this.#targetMs();
+    if (!this.#playing) this.#begin(bufferedMs - this.#targetMs());
     const first = this.#chunks[0];
     if (!this.#playing || !first) return null;
     const startUs = first.timestampUs + (this.#at / first.rate) * 1e6;
@@ -90,6 +90,14 @@ export class JitterBuffer {
     // Nothing plays until more is buffered.
     if (postponedMs > this.#postponedMs) this.#playing = false;
     this.#postponedMs = postponedMs;
+  }
+
+  /** The last chunk brings up to its length too much, which would delay audio and video for good. More is of a burst. */
+  #begin(surplusMs: number): void {
+    const first = this.#chunks[0];
+    if (!first || surplusMs < 0) return;
+    this.#playing = true;
+    this.#advance(Math.floor((Math.min(surplusMs, this.#maxChunkMs) / 1000) * first.rate));
   }
 
   #noteCalm(seconds: number): void {
