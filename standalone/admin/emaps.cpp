@@ -91,6 +91,8 @@ Emap RequireEmap(store::Store& store, int id) {
 Emap AddEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, const EmapChange& change) {
     RequireManager(store, actor);
     Emap emap;
+    emap::Pictures pictures(store, home);
+    Sweep(pictures);  // what cut uploads have left, which nothing else bounds
     NewPicture picture(store, home, change.picture.value());
     Apply(store, actor, [&] {
         Emaps emaps(store);
@@ -115,6 +117,7 @@ Emap SetEmap(store::Store& store, const Actor& actor, const std::filesystem::pat
     emap::Pictures pictures(store, home);
     std::optional<NewPicture> picture;
     if (change.picture) {
+        Sweep(pictures);
         picture.emplace(store, home, *change.picture);
         pictures.Touch(RequireEmap(store, id).image);
     }

@@ -75,6 +75,14 @@ std::string Invite(store::Store& store, const Actor& actor, const std::string& n
     return remote::ToText(code);
 }
 
+void VoidInvitationOf(store::Store& store, int user_id) {
+    store::Settings settings(store);
+    const Json::Value invitation = FromText(settings.Find(kInvitationSetting).value_or(""));
+    if (invitation.isObject() && invitation["user"] == user_id) {
+        settings.Set(kInvitationSetting, "");
+    }
+}
+
 void RequireInvitation(store::Store& store, const base::BootTime& now) {
     FindInvitation(store, now);
 }

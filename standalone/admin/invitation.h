@@ -3,8 +3,9 @@
 // A code that is shown here and typed on another host, which then may show this one's cameras.
 //
 // Invariants    (1) At most one code is valid: a new one voids the one before.
-//               (2) It makes one pairing; while whoever asked for it is a manager; for kInvitationLifetimeS, which a
-//                   clock that is set does not lengthen; and not beyond a restart of the machine.
+//               (2) It makes one pairing; while whoever asked for it is a manager, with the same password, whose
+//                   sessions nobody has ended; for kInvitationLifetimeS, which a clock that is set does not lengthen;
+//                   and not beyond a restart of the machine.
 //               (3) The store holds the digest of its secret only.
 //               (4) Wrong guesses, however many, void no code, and change nothing.
 #pragma once
@@ -32,6 +33,9 @@ class InvalidInvitation : public std::runtime_error {
   public:
     using std::runtime_error::runtime_error;
 };
+
+// Voids the code that this account has asked for, if one is valid. Call it where the account's access is taken back.
+void VoidInvitationOf(store::Store& store, int user_id);
 
 // Throws InvalidInvitation where no code, whatever its secret, could be accepted now: then there is nothing to be
 // guessed. Reads alone.

@@ -2,7 +2,8 @@
 #include "standalone/admin/servers.h"
 
 #include <algorithm>
-#include <iterator>
+#include <map>
+#include <utility>
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/settings.h"
@@ -39,21 +40,16 @@ Json::Value AuditedByName(store::Store& store, const std::string& name) {
     return found == all.end() ? Json::Value() : Audited(*found);
 }
 
-std::vector<store::RemoteCamera> CamerasOf(store::Store& store, int id) {
-    std::vector<store::RemoteCamera> cameras;
-    std::ranges::copy_if(RecordingServers(store).ListCameras(), std::back_inserter(cameras),
-                         [id](const store::RemoteCamera& camera) { return camera.server_id == id; });
-    return cameras;
-}
-
-// {"cameras": ["Yard (4)"]}, with their ids here.
-Json::Value AuditedCameras(store::Store& store, int id) {
-    Json::Value record;
-    record["cameras"] = Json::arrayValue;
-    for (const store::RemoteCamera& camera : CamerasOf(store, id)) {
-        record["cameras"].append(Named(camera.name, camera.id));
+bool AreAllKnown(store::Store& store, int id, const std::vector<store::RemoteCamera>& cameras) {
+    std::map<int, store::RemoteCamera> known;
+    for (store::RemoteCamera& camera : RecordingServers(store).ListCameras(id)) {
+        known[camera.id_on_server] = std::move(camera);
     }
-    return record;
+    return std::ranges::all_of(cameras, [&known](const store::RemoteCamera& camera) {
+        const auto found = known.find(camera.id_on_server);
+        return found != known.end() && found->second.name == camera.name && found->second.audio == camera.audio &&
+               found->second.video_type == camera.video_type;
+    });
 }
 
 // A secret is told of, not told.
@@ -106,12 +102,19 @@ RecordingServer AddServer(store::Store& store, const Actor& actor, RecordingServ
 }
 
 int PutServerCameras(store::Store& store, const Actor& actor, int id, const std::vector<store::RemoteCamera>& cameras) {
+    RequireManager(store, actor);
+    if (AreAllKnown(store, id, cameras)) {
+        return 0;  // each minute: locks nothing
+    }
     int added = 0;
     Apply(store, actor, [&] {
         const RecordingServer server = RequireServer(store, id);
-        const Json::Value before = AuditedCameras(store, id);
         added = RecordingServers(store).PutCameras(id, cameras);
-        return Change{"server.cameras", Named(server.name, id), before, AuditedCameras(store, id)};
+        Json::Value after;
+        if (added > 0) {
+            after["added"] = added;
+        }
+        return Change{"server.cameras", Named(server.name, id), {}, after};
     });
     return added;
 }
@@ -132,7 +135,7 @@ RecordingServer SetServer(store::Store& store, const Actor& actor, int id, const
 }
 
 ServerLoss LossOf(store::Store& store, int id) {
-    return {CamerasOf(store, id), RecordingServers(store).Denials(id)};
+    return {RecordingServers(store).ListCameras(id), RecordingServers(store).Denials(id)};
 }
 
 ServerLoss RemoveServer(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,

@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "standalone/admin/change.h"
+#include "standalone/admin/invitation.h"
 #include "standalone/admin/user_record.h"
 #include "standalone/base/clock.h"
 #include "standalone/store/audit_log.h"
@@ -88,6 +89,7 @@ Json::Value Make(store::Store& store, const User& before, const UserChange& chan
     Users users(store);
     if (change.password) {
         users.SetPassword(before.id, *change.password);
+        VoidInvitationOf(store, before.id);
     }
     if (change.privilege && *change.privilege != before.privilege) {
         users.SetPrivilege(before.id, *change.privilege);
@@ -173,6 +175,7 @@ int EndSessions(store::Store& store, const Actor& actor, int id, const std::opti
         RequireMayManage(users, actor, user.privilege);
         store::Sessions sessions(store);
         ended = handle ? sessions.End(id, *handle) : sessions.EndOfUser(id, kept);
+        VoidInvitationOf(store, id);
         Json::Value after;
         after["ended"] = ended;
         return Change{"user.endSessions", Named(user.name, id), {}, ended > 0 ? after : Json::Value()};
@@ -184,6 +187,7 @@ void ChangePassword(store::Store& store, const std::string& address, const store
                     const store::HashedPassword& password, std::string_view kept_session) {
     store::InTransaction(store, [&] {
         Users(store).SetPassword(user, password, kept_session);
+        VoidInvitationOf(store, user.id);
         store::AuditLog(store).Add({0, base::WallSeconds(), user.id, user.name, address, "user.changePassword",
                                     Named(user.name, user.id), "", R"({"password":"new"})"});
     });

@@ -46,10 +46,13 @@ std::string TryCode(const Call& call, const std::string& address) {
     const std::string code = call.Parameter("code").asString();  // a number, where all its digits are decimal ones
     const base::BootTime now = base::TimeSinceBoot();
     admin::RequireInvitation(call.Records(), now);
-    CountAttempt(call, kCode);
-    std::string secret = admin::AcceptInvitation(call.Records(), code, address, now);
-    ForgetAttempts(call, kCode);
-    return secret;
+    try {
+        return admin::AcceptInvitation(call.Records(), code, address, now);
+    } catch (const admin::InvalidInvitation&) {
+        // Wrong ones alone: whoever shares the other host's network must not keep the right one out.
+        CountAttempt(call, kCode);
+        throw;
+    }
 }
 
 std::string Accept(const Call& call) {

@@ -98,10 +98,6 @@ void CountAttempt(const Call& call, const char* secret) {
     RefuseUnlessNow(throttle.Enter(secret, network, base::WallSeconds()), secret);
 }
 
-void ForgetAttempts(const Call& call, const char* secret) {
-    store::LoginThrottle(call.Records()).Clear(secret, NetworkOf(call.request.Header("REMOTE_ADDR")));
-}
-
 std::string RequireNewPassword(const Call& call, const std::string& parameter) {
     std::string password = call.Parameter(parameter).asString();
     store::RequirePassword(password);

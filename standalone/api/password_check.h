@@ -38,10 +38,8 @@ void CheckSetupToken(const Call& call, const std::string& token);
 
 // Counts an attempt with a secret that is no password by the caller's network, as a log-in is counted by account and
 // network. secret: what it is, "setup token"; no account has a name with a space. Throws Failure 429 from the sixth
-// within a minute on; the secret must not be looked at then.
+// within a minute on. Call it for wrong ones, after the look.
 void CountAttempt(const Call& call, const char* secret);
-// After the right one.
-void ForgetAttempts(const Call& call, const char* secret);
 
 // The new password of the parameter of that name, not hashed yet. To be asked before anything is hashed. Throws
 // store::InvalidRecord for what is no password; Json::Exception for what is no text.

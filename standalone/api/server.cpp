@@ -11,6 +11,7 @@
 #include "standalone/api/password_check.h"
 #include "standalone/api/revision.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/concat.h"
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/remote/certificate_loader.h"
@@ -151,6 +152,8 @@ std::string Pair(const Call& call) {
     } catch (const remote::InvalidPairingCode& error) {
         throw Failure(400, error.what());
     } catch (const admin::CannotPair& error) {
+        base::LogWarning(base::Concat("account ", call.Actor().name, " cannot pair with port ", port, " of ", address,
+                                      ": ", error.what()));
         throw Failure(502, error.what(), 0, NameOf(error.Why()));
     }
 }

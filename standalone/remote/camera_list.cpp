@@ -37,6 +37,9 @@ std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list) {
 Json::Value DataInAnswer(const std::string& text) try {
     const Json::Value json = Parse(text);
     if (json.isObject() && json["data"].isObject() && json["data"]["camera"].isArray()) {
+        if (json["data"]["camera"].size() > store::kMaxServerCameras) {
+            throw NoAnswer("more cameras than a host may have");
+        }
         return json["data"];
     }
     throw NoAnswer(kNotUnderstood);

@@ -44,7 +44,6 @@ namespace {
 constexpr std::size_t kMaxCameraNameBytes = 255;
 constexpr std::size_t kMaxCertificateBytes = 16'384;
 constexpr std::size_t kSecretDigits = 64;
-constexpr int kMaxCameras = 1000;  // of a server: what it says of itself must not fill the store
 
 // Looks at the first and the last line; what stands between them is for the TLS library to judge.
 bool IsCertificate(std::string_view text) {
@@ -116,7 +115,8 @@ PutCounts PutRows(soci::session& sql, int server_id, const std::vector<RemoteCam
         camera.server_id = server_id;
         PutRow(sql, camera, counts);
     }
-    if (FetchOne<int>(sql, "select count(*) from remote_cameras where server_id = :id", server_id) > kMaxCameras) {
+    if (FetchOne<int>(sql, "select count(*) from remote_cameras where server_id = :id", server_id) >
+        static_cast<int>(kMaxServerCameras)) {
         throw InvalidRecord("a server has 1000 cameras at most");
     }
     return counts;
@@ -285,6 +285,10 @@ std::optional<RemoteCamera> RecordingServers::FindCamera(int server_id, int id_o
 
 std::vector<RemoteCamera> RecordingServers::ListCameras() {
     return connection_.FetchAll<RemoteCamera>("order by id");
+}
+
+std::vector<RemoteCamera> RecordingServers::ListCameras(int server_id) {
+    return connection_.FetchAll<RemoteCamera>("where server_id = :id order by id", server_id);
 }
 
 }  // namespace lookhaven::store

@@ -24,6 +24,8 @@ struct RecordingServer {
     bool enabled = true;
 };
 
+constexpr unsigned int kMaxServerCameras = 1000;  // what a host says of itself must not fill the store
+
 // A camera of a recording server. Its id comes from the same counter as those of this host's own.
 struct RemoteCamera {
     int id = 0;
@@ -92,7 +94,8 @@ class RecordingServers {
     void RemoveCamera(int id);
     std::optional<RemoteCamera> FindCamera(int id);
     std::optional<RemoteCamera> FindCamera(int server_id, int id_on_server);
-    std::vector<RemoteCamera> ListCameras();  // by id
+    std::vector<RemoteCamera> ListCameras();               // by id
+    std::vector<RemoteCamera> ListCameras(int server_id);  // its own alone
 
   private:
     Connection& connection_;
