@@ -21,11 +21,11 @@ await visit(async (page, complaints) => {
 
   await page.getByLabel("Name").fill("Loading bay");
   await page.getByText("By the hour").click();
-  for (const [mode, days] of [["Never", ["Mo", "Tu", "We", "Th", "Fr"]], ["On alarm", ["Sa", "Su"]]]) {
+  for (const [mode, days] of [["Never", ["Mo", "Tu", "We", "Th", "Fr"]], ["On alert", ["Sa", "Su"]]]) {
     await page.locator(".plan").getByText(mode, { exact: true }).click();
     for (const day of days) await page.locator(".plan-day", { hasText: day }).click();
   }
-  await page.getByLabel("Seconds before an alarm").fill("7");
+  await page.getByLabel("Seconds before an alert").fill("7");
   await page.getByRole("button", { name: "Add the camera" }).click();
   await page.locator(".camera-row", { hasText: "Loading bay" }).waitFor();
   await page.evaluate(() => void (location.hash = "#"));

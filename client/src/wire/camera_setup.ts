@@ -20,17 +20,17 @@ export interface CameraSource {
 }
 
 export interface RecordingPlan {
-  /** "never" but around alarms; "schedule" goes by `hours`. */
+  /** "never" but around alerts; "schedule" goes by `hours`. */
   mode: "never" | "always" | "schedule";
   /** Seconds; how long a file becomes. */
   segment: number;
-  /** Seconds before and after an alarm that are kept with it. */
+  /** Seconds before and after an alert that are kept with it. */
   pre: number;
   post: number;
   /** 0: the default mount. */
   mount: number;
   profile: number;
-  /** A character for each hour of the server's week, from Monday 00:00 on: 0 never, 1 always, 2 on alarm. */
+  /** A character for each hour of the server's week, from Monday 00:00 on: 0 never, 1 always, 2 on alert. */
   hours: string;
 }
 

@@ -115,7 +115,7 @@ export class SettingsScreen extends Screen {
       ["Tab", "From control to control"],
       ["Up Down", "On a handle in the list of cameras: move the camera"],
       ["Left Right Up Down", "In the recording plan: from hour to hour; with Shift paint on the way"],
-      ["0 1 2", "In the recording plan: never, always, on alarm"],
+      ["0 1 2", "In the recording plan: never, always, on alert"],
     ];
   }
 

@@ -21,13 +21,13 @@ test("a stroke paints the rectangle between two hours, in whatever direction it 
     const hours = painted(never, from, to, 2);
     expect([...hours].flatMap((mode, at) => (mode === "2" ? [at] : []))).toEqual(expected);
   }
-  expect(weekText(painted(painted(never, 0, 9, 1), 24, 25, 2))).toBe("each week 10 h always, 2 h on alarm");
+  expect(weekText(painted(painted(never, 0, 9, 1), 24, 25, 2))).toBe("each week 10 h always, 2 h on alert");
   expect(weekText(never)).toBe("not recorded");
 });
 
 test.each([
   [{ mode: "always" }, "recorded always"],
-  [{ mode: "never" }, "recorded on alarm only"],
+  [{ mode: "never" }, "recorded on alert only"],
   [{ mode: "schedule", hours: painted(never, 0, 9, 1) }, "recorded each week 10 h always"],
   [{ mode: "schedule", hours: never }, "not recorded"],
   [{ mode: "always", enabled: false }, "not recorded"],

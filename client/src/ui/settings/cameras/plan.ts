@@ -10,7 +10,7 @@ export const kHoursOfDay = 24;
 const kHoursOfWeek = kDays.length * kHoursOfDay;
 
 /** What an hour's character means. */
-export const kHourModes = ["never", "always", "on alarm"] as const;
+export const kHourModes = ["never", "always", "on alert"] as const;
 
 /** As new cameras have it. */
 export const kFirstPlan: RecordingPlan = {
@@ -43,7 +43,7 @@ export function painted(hours: string, from: number, to: number, mode: number): 
 
 const kNotRecorded = "not recorded";
 
-/** "always", "not recorded", "each week 98 h always, 70 h on alarm". */
+/** "always", "not recorded", "each week 98 h always, 70 h on alert". */
 export function weekText(hours: string): string {
   const count = (mode: number) => [...hours].filter((hour) => Number(hour) === mode).length;
   const counts = kHourModes.map((text, mode) => ({ text, count: count(mode) }));
@@ -61,10 +61,10 @@ export function hourText(at: number): string {
 }
 
 function whenText({ mode, hours }: RecordingPlan): string {
-  return { never: "on alarm only", always: "always", schedule: weekText(hours) }[mode];
+  return { never: "on alert only", always: "always", schedule: weekText(hours) }[mode];
 }
 
-/** "recorded always", "recorded on alarm only", "not recorded". */
+/** "recorded always", "recorded on alert only", "not recorded". */
 export function recordedText({ enabled, plan }: Pick<CameraSettings, "enabled" | "plan">): string {
   const when = enabled ? whenText(plan) : kNotRecorded;
   return when === kNotRecorded ? when : `recorded ${when}`;
@@ -73,8 +73,8 @@ export function recordedText({ enabled, plan }: Pick<CameraSettings, "enabled" |
 /** The whole plan. */
 export function planText(plan: RecordingPlan, mounts: readonly Named[]): string {
   const when = whenText(plan);
-  const hasAlarms = plan.mode === "never" || (plan.mode === "schedule" && plan.hours.includes("2"));
-  const alarms = hasAlarms ? `, ${plan.pre} s before and ${plan.post} s after an alarm` : "";
+  const hasAlerts = plan.mode === "never" || (plan.mode === "schedule" && plan.hours.includes("2"));
+  const alerts = hasAlerts ? `, ${plan.pre} s before and ${plan.post} s after an alert` : "";
   const mount = mounts.find(({ id }) => id === plan.mount)?.name ?? "the default mount";
-  return `${when}${alarms}, files of ${duration(plan.segment)}, on ${mount}`;
+  return `${when}${alerts}, files of ${duration(plan.segment)}, on ${mount}`;
 }

@@ -16,25 +16,25 @@ export class PlanField implements Field<RecordingPlan> {
   readonly #mode = radioField<RecordingPlan["mode"]>("Record", [
     ["always", "Always"],
     ["schedule", "By the hour"],
-    ["never", "On alarm only"],
+    ["never", "On alert only"],
   ]);
   readonly #grid = new PlanGrid();
-  readonly #pre = numberField("Seconds before an alarm", 0, 300);
-  readonly #post = numberField("Seconds after an alarm", 0, 300);
+  readonly #pre = numberField("Seconds before an alert", 0, 300);
+  readonly #post = numberField("Seconds after an alert", 0, 300);
   readonly #segment = numberField("Minutes per file", 0.16, 60);
   readonly #profile = selectField(
     "Recorded stream",
     kProfiles.map((name, profile) => [String(profile), name] as const),
   );
   readonly #mount: Field<string>;
-  readonly #alarm: HTMLElement;
+  readonly #around: HTMLElement;
 
   constructor(mounts: CameraSetupList["mount"]) {
     const names = mounts.map(({ id, name }) => [String(id), name] as const);
     this.#mount = selectField("Mount", [["0", "The default mount"], ...names]);
-    this.#alarm = formRow(this.#pre, this.#post);
+    this.#around = formRow(this.#pre, this.#post);
     const files = formRow(this.#segment, this.#profile, this.#mount);
-    this.root.append(this.#mode.root, this.#grid.root, this.#alarm, files);
+    this.root.append(this.#mode.root, this.#grid.root, this.#around, files);
     this.root.addEventListener("input", () => this.#adapt());
     this.value = kFirstPlan;
   }
@@ -66,6 +66,6 @@ export class PlanField implements Field<RecordingPlan> {
   #adapt(): void {
     const mode = this.#mode.value;
     this.#grid.root.hidden = mode !== "schedule";
-    this.#alarm.hidden = mode === "always" || (mode === "schedule" && !this.#grid.value.includes("2"));
+    this.#around.hidden = mode === "always" || (mode === "schedule" && !this.#grid.value.includes("2"));
   }
 }

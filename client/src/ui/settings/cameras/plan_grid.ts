@@ -18,11 +18,11 @@ const kSteps: Record<string, [day: number, hour: number]> = {
 
 const kHint =
   "Drag over hours, or use the arrow keys: Space paints an hour, Shift with an arrow paints on the way; 0, 1 and 2 set never, " +
-  "always and on alarm.";
+  "always and on alert.";
 
 export class PlanGrid implements Field<string> {
   readonly root: HTMLElement;
-  readonly #brush = radioField("Paint with", [["1", "Always"], ["2", "On alarm"], ["0", "Never"]]);
+  readonly #brush = radioField("Paint with", [["1", "Always"], ["2", "On alert"], ["0", "Never"]]);
   readonly #grid = element("div", { class: "plan-grid", role: "grid", "aria-label": "Hours of the week" });
   readonly #status = element("p", { class: "plan-status", "aria-live": "off" });
   readonly #cells: HTMLElement[] = [];
