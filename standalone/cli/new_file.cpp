@@ -21,7 +21,7 @@ void WriteNewFile(const std::string& file, const std::function<void(int descript
         }
     } catch (...) {
         if (::unlink(file.c_str()) != 0) {
-            static_cast<void>(::ftruncate(output.Get(), 0));  // no longer ours to remove
+            [[maybe_unused]] const int ignored = ::ftruncate(output.Get(), 0);  // no longer ours to remove
         }
         throw;
     }
