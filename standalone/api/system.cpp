@@ -13,7 +13,9 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/settings.h"
+#include "standalone/api/certificate.h"
 #include "standalone/api/health.h"
+#include "standalone/api/log_levels.h"
 #include "standalone/api/metrics.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/revision.h"
@@ -168,7 +170,10 @@ constexpr Method kMethods[] = {{"Health", Health},
                                {"Status", Status, kChanges, kManagers},
                                {"Audit", Audit, kChanges, kManagers},
                                {"Settings", Settings, kChanges, kManagers},
-                               {"SetSetting", SetSetting, kChanges, kManagers}};
+                               {"SetSetting", SetSetting, kChanges, kManagers},
+                               {"SetCertificate", SetCertificate, kChanges, kManagers},
+                               {"LogLevels", LogLevels, kChanges, kManagers},
+                               {"SetLogLevels", SetLogLevels, kChanges, kManagers}};
 
 }  // namespace
 

@@ -2,22 +2,20 @@
 #include "standalone/api/system_status.h"
 
 #include <chrono>
-#include <filesystem>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include <unistd.h>
 
+#include "standalone/admin/certificate.h"
 #include "standalone/admin/change.h"
-#include "standalone/base/file.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/process.h"
 #include "standalone/base/version.h"
 #include "standalone/control/common_config.h"
 #include "standalone/doctor/apart.h"
 #include "standalone/doctor/checks.h"
-#include "standalone/remote/certificate_loader.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::api {
@@ -50,21 +48,6 @@ Json::Value Parts(const base::Installation& installation) {
         PartRecord("recorder", NameOf(control::FindRecorder(installation)), control::RecorderProcess(installation)));
     list.append(PartRecord("webapi", "running", base::ProcessIdentity{host, base::ProcessStartTicks(host)}));
     return list;
-}
-
-// Null where the installation has none; the checks say what is wrong with one that cannot be read.
-Json::Value CertificateRecord(const base::Installation& installation) {
-    const std::filesystem::path path = installation.TlsFolder() / "certificate.pem";
-    if (std::error_code ignored; !std::filesystem::exists(path, ignored)) {
-        return {};
-    }
-    const remote::CertificateFacts facts = remote::LoadAndReadCertificate(base::ReadFile(path));
-    Json::Value json;
-    json["subject"] = facts.subject;
-    json["fingerprint"] = facts.fingerprint;
-    json["end"] = Json::Int64{facts.end_s};
-    json["selfSigned"] = facts.is_self_signed;
-    return json;
 }
 
 std::string ReportOf(const doctor::Check& check, const base::Installation& installation) {
@@ -106,7 +89,8 @@ Json::Value SystemStatus(const Call& call) {
     for (const doctor::Check& check : doctor::Checks()) {
         jobs.emplace_back([&] { return ReportOf(check, installation); });
     }
-    jobs.emplace_back([&] { return base::OneLineJson(CertificateRecord(installation)); });
+    // The checks say what is wrong with one that cannot be read.
+    jobs.emplace_back([&] { return base::OneLineJson(admin::CurrentCertificate(installation)); });
     call.context.CloseRecords();  // it must not be shared with other processes
     std::vector<doctor::JobResult> results = doctor::RunApart(jobs, kLimit);
     data["certificate"] = admin::FromText(results.back().text);

@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <map>
 
-#include "standalone/base/process.h"
+#include "standalone/admin/log_levels.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/table.h"
@@ -14,17 +14,15 @@ namespace lookhaven::cli {
 
 namespace {
 
-const Names<int> kLevels = {{"off", 0}, {"error", 1}, {"warning", 3}, {"notice", 4}, {"info", 5}, {"debug", 6}};
-const Names<int> kCategories = {{"liveview", 32}, {"player", 68}};
-
 struct Request {
     int level = 0;
     std::vector<int> categories;
     std::vector<pid_t> processes;
 };
 
-constexpr Column kColumns[] = {
-    {"what", "what"}, {"level", "level", [](const Json::Value& level) { return NameOf(kLevels, level.asInt()); }}};
+constexpr Column kColumns[] = {{"what", "what"}, {"level", "level", [](const Json::Value& level) {
+                                                      return NameOf(admin::LogLevels(), level.asInt());
+                                                  }}};
 
 std::string LevelTable(const Json::Value& data) {
     Json::Value rows = Json::arrayValue;
@@ -56,8 +54,8 @@ void Show(const Console& console) {
     Json::Value categories = Json::arrayValue;
     for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
         const int level = config->category_level[category];
-        const std::string name = NameOf(kCategories, category);
-        if (level != common || kCategories.contains(name)) {
+        const std::string name = NameOf(admin::LogCategories(), category);
+        if (level != common || admin::LogCategories().contains(name)) {
             categories.append(Object("category", category, "name", name, "level", level));
         }
     }
@@ -70,25 +68,18 @@ void Show(const Console& console) {
 }
 
 void Set(const Console& console, const Request& request) {
-    control::DebugLogEditor editor(console.Installation());
-    for (const pid_t pid : request.processes) {
-        if (request.level != 0 && base::ProcessStartTicks(pid) == 0) {
-            throw Failure(kDataError, "there is no process ", pid);
-        }
-    }
+    store::Store store = console.OpenStore();
+    admin::LogChange change;
     for (const int category : request.categories) {
-        editor.SetCategory(category, request.level);
+        change.categories[category] = request.level;
     }
     for (const pid_t pid : request.processes) {
-        if (request.level == 0) {
-            editor.RemoveProcess(pid);
-        } else {
-            editor.SetProcess(pid, request.level);
-        }
+        change.processes[pid] = request.level;
     }
     if (request.categories.empty() && request.processes.empty()) {
-        editor.SetEveryCategory(request.level);
+        change.every = request.level;
     }
+    admin::SetLogLevels(store, console.Installation(), {}, {}, change);
     Show(console);
 }
 
@@ -98,12 +89,13 @@ void AddLog(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console, "log", "Log levels");
     Request& request = group.request();
     const auto category = [](CLI::Option& option) {
-        option.transform(CLI::Transformer(kCategories).description(""))->type_name("liveview|player|NUMBER");
+        option.transform(CLI::Transformer(admin::LogCategories()).description(""))->type_name("liveview|player|NUMBER");
         option.check(CLI::Range(0, control::kDebugLogCategoryCount - 1));
     };
     group.Add("show", "Shows the log levels", Show);
     group.Add("set", "Sets the log level of categories or processes, or of all categories", Set)
-        .Option("level", request.level, "Log messages of this level and more severe ones", OneOf(kLevels), Required)
+        .Option("level", request.level, "Log messages of this level and more severe ones", OneOf(admin::LogLevels()),
+                Required)
         .Option("--category", request.categories, "A category by name or number; may be repeated", Repeatable, category)
         .Option("--process", request.processes, "A process id; may be repeated", Repeatable,
                 Satisfies(CLI::PositiveNumber));

@@ -8,6 +8,7 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/mount_claim.h"
+#include "standalone/admin/web_server.h"
 #include "standalone/archive/archive_error.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/state_folder.h"
@@ -85,9 +86,9 @@ int Run(int argc, char** argv) {
     program.add_option("--home", console.home_option,
                        "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
-    for (const auto add :
-         {AddInit, AddSetupAddress, AddAudit, AddCamera, AddUser, AddLog, AddGroup, AddMount, AddEvent, AddExport,
-          AddEmap, AddDevices, AddServer, AddSetting, AddStore, AddBackup, AddVerify, AddDemo, AddDoctor}) {
+    for (const auto add : {AddInit,    AddSetupAddress, AddAudit,  AddCamera, AddUser, AddCertificate, AddLog,
+                           AddGroup,   AddMount,        AddEvent,  AddExport, AddEmap, AddDevices,     AddServer,
+                           AddSetting, AddStore,        AddBackup, AddVerify, AddDemo, AddDoctor}) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);
@@ -109,6 +110,8 @@ int Run(int argc, char** argv) {
         return Report(console, kDataError, error.what());
     } catch (const admin::StillNeeded& error) {
         return Report(console, kDataError, error.what());
+    } catch (const admin::WebServerRefused& error) {
+        return Report(console, kUnavailable, error.what());
     } catch (const admin::UnusableFolder& error) {
         return Report(console, CodeOf(error), error.what());
     } catch (const store::NotFound& error) {

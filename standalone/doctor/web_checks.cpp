@@ -93,8 +93,8 @@ Findings CheckCertificate(const base::Installation& installation) {
                    : Findings{{"there is no certificate at " + path.string(), "restart the server, which makes one"}};
     }
     const std::string remedy =
-        "put a valid certificate.pem and key.pem there and restart the server; a self-signed one that "
-        "was made here is replaced when it restarts";
+        "replace it by a valid one: lookhaven certificate set CERTIFICATE KEY; a self-signed one that was made here is "
+        "replaced when the server restarts";
     try {
         const std::int64_t end_s = remote::LoadAndReadCertificate(base::ReadFile(path)).end_s;
         const std::int64_t left_s = end_s - base::WallSeconds();

@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/remote/certificate.h"
 
+#include <algorithm>
 #include <array>
 #include <ctime>
+#include <iterator>
 #include <memory>
-#include <optional>
 #include <string_view>
+#include <utility>
 
+#include <arpa/inet.h>
 #include <openssl/pem.h>
 #include <openssl/x509v3.h>
 
@@ -37,22 +40,32 @@ Certificate RequireFirst(const Bio& bio) {
     return certificate;
 }
 
+bool IsPrintable(char c) {
+    return c > ' ' && c <= '~';
+}
+
 std::string TextOf(const ASN1_STRING* text) {
     return {reinterpret_cast<const char*>(ASN1_STRING_get0_data(text)),
             static_cast<std::size_t>(ASN1_STRING_length(text))};
 }
 
-std::optional<std::string> FirstDnsName(const X509* certificate) {
-    const Names names(
-        static_cast<GENERAL_NAMES*>(X509_get_ext_d2i(certificate, NID_subject_alt_name, nullptr, nullptr)),
-        GENERAL_NAMES_free);
-    for (int i = 0; names && i < sk_GENERAL_NAME_num(names.get()); ++i) {
-        const GENERAL_NAME* name = sk_GENERAL_NAME_value(names.get(), i);
-        if (name->type == GEN_DNS) {
-            return TextOf(name->d.dNSName);
+// Empty for what is no address.
+std::string AddressText(const ASN1_OCTET_STRING* bytes) {
+    char text[INET6_ADDRSTRLEN];
+    const int family = ASN1_STRING_length(bytes) == 4 ? AF_INET : ASN1_STRING_length(bytes) == 16 ? AF_INET6 : 0;
+    return family != 0 && ::inet_ntop(family, ASN1_STRING_get0_data(bytes), text, sizeof text) != nullptr ? text : "";
+}
+
+std::vector<std::string> NamesOf(const X509* certificate, int type) {
+    const Names all(static_cast<GENERAL_NAMES*>(X509_get_ext_d2i(certificate, NID_subject_alt_name, nullptr, nullptr)),
+                    GENERAL_NAMES_free);
+    std::vector<std::string> names;
+    for (int i = 0; all && i < sk_GENERAL_NAME_num(all.get()); ++i) {
+        if (const GENERAL_NAME* name = sk_GENERAL_NAME_value(all.get(), i); name->type == type) {
+            names.push_back(type == GEN_DNS ? TextOf(name->d.dNSName) : AddressText(name->d.iPAddress));
         }
     }
-    return std::nullopt;
+    return names;
 }
 
 std::string CommonName(const X509* certificate) {
@@ -104,7 +117,8 @@ std::string CertificatesIn(const std::string& pem) {
 
 std::string CertificateName(const std::string& pem) {
     const Certificate certificate = RequireFirst(Open(pem));
-    std::string name = FirstDnsName(certificate.get()).value_or(CommonName(certificate.get()));
+    const std::vector<std::string> names = NamesOf(certificate.get(), GEN_DNS);
+    std::string name = names.empty() ? CommonName(certificate.get()) : names.front();
     if (name.starts_with("*.")) {
         name.replace(0, 1, "host");
     }
@@ -122,8 +136,12 @@ CertificateFacts ReadCertificate(const std::string& pem) {
     if (ASN1_TIME_to_tm(X509_get0_notAfter(certificate.get()), &end) != 1) {
         throw InvalidCertificate("the certificate names no end of its validity");
     }
+    std::vector<std::string> names = NamesOf(certificate.get(), GEN_DNS);
+    std::ranges::move(NamesOf(certificate.get(), GEN_IPADD), std::back_inserter(names));
+    std::erase_if(names,
+                  [](const std::string& name) { return name.empty() || !std::ranges::all_of(name, IsPrintable); });
     return {SubjectOf(certificate.get()), FingerprintOf(certificate.get()), ::timegm(&end),
-            X509_self_signed(certificate.get(), 1) == 1};
+            X509_self_signed(certificate.get(), 1) == 1, std::move(names)};
 }
 
 }  // namespace lookhaven::remote

@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
 namespace lookhaven::remote {
 
@@ -28,6 +29,8 @@ struct CertificateFacts {
     std::string fingerprint;  // SHA-256 of its DER form, as browsers show it: "AB:0C:…"
     std::int64_t end_s = 0;   // UTC seconds when it expires
     bool is_self_signed = false;
+    // The hosts that it is valid for, DNS names before addresses; those alone that are printable ASCII.
+    std::vector<std::string> names = {};
 };
 
 // Throws InvalidCertificate when there is none, or one without an end.

@@ -1,13 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// ReadCertificate for programs that must stay small: what reads it is loaded when it is first needed.
+// What is known of certificates for programs that must stay small: what reads them is loaded when it is first needed.
 #pragma once
 
 #include "standalone/remote/certificate.h"
+#include "standalone/remote/certificate_pair.h"
 
 namespace lookhaven::remote {
 
-// As ReadCertificate; throws std::runtime_error, too, when the library cannot be loaded.
+// As ReadCertificate, ReadCertificatePair and IsTrustedThrough; each throws std::runtime_error, too,
+// when the library cannot be loaded.
 CertificateFacts LoadAndReadCertificate(const std::string& pem);
+CertificatePair LoadAndReadCertificatePair(const std::string& chain_pem, const std::string& key_pem,
+                                           std::int64_t now_s);
+bool LoadAndFindTrust(const std::string& known_pem, const std::string& chain_pem);
 
 }  // namespace lookhaven::remote

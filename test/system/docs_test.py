@@ -4,11 +4,13 @@
 import base64
 import contextlib
 import json
+import pathlib
 import re
+import tempfile
 import time
 import unittest
 
-from installation import PASSWORDS, ROOT, Installation, call, recorded_events
+from installation import PASSWORDS, ROOT, Installation, call, make_certificate, recorded_events
 from parts import Parts
 
 # For a file that an example names: one pixel.
@@ -36,8 +38,14 @@ def words(server):
     hosts = server.request(call("VEXO.Server", "List"), "admin", {}).json["data"]["server"]
     accounts = server.request(call("VEXO.User", "List"), "admin", {}).json["data"]["user"]
     mounts = server.request(call("VEXO.Mount", "List"), "admin", {}).json["data"]["mount"]
+    with tempfile.TemporaryDirectory() as folder:
+        make_certificate(folder, "nvr", 90)
+        certificate, key = (json.dumps(pathlib.Path(folder, name).read_text())[1:-1] for name in ("certificate.pem", "key.pem"))
     settings = server.request(call("VEXO.System", "Settings"), "admin", {}).json["data"]["setting"]
     return {
+        "$LOG_REVISION": str(server.request(call("VEXO.System", "LogLevels"), "admin", {}).json["data"]["log"]["revision"]),
+        "$CERTIFICATE": certificate,
+        "$KEY": key,
         "$SETTING_REVISION": str(next(one["revision"] for one in settings if one["name"] == "marks_per_day")),
         "$ADMIN_PASSWORD": PASSWORDS["admin"].replace(" ", "+"),
         "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),

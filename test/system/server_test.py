@@ -16,7 +16,7 @@ import tempfile
 import time
 import unittest
 
-from installation import BUILD, ROOT, Installation, free_port, make_certificate, wait_until
+from installation import BUILD, PASSWORDS, ROOT, Installation, call, free_port, make_certificate, wait_until
 
 
 def said_by(*command, **options):
@@ -172,6 +172,37 @@ class ServerTest(unittest.TestCase):
             server.start()
             self.assertIn("expires within 30 days", server.said())
             self.assertEqual([(folder / name).read_bytes() for name in ("certificate.pem", "key.pem")], owners)
+
+    def test_another_certificate_is_shown_at_once_or_the_one_from_before_stays(self):
+        def shown():
+            return ssl.get_server_certificate(("127.0.0.1", server.tls_port))
+
+        def on_disk():
+            return [(server.home / "tls" / name).read_text() for name in names]
+
+        names = "certificate.pem", "key.pem"
+        with Installation() as server, tempfile.TemporaryDirectory() as folder:
+            own = [pathlib.Path(folder, name) for name in names]
+            make_certificate(folder, "own.example", 90)
+            with server.live(1) as parts:
+                self.assertIn("The web server shows it.", server.cli("certificate", "set", *map(str, own)))
+                self.assertEqual(shown(), own[0].read_text())
+                self.assertFalse(parts.ends(), "who watches goes on")
+            make_certificate(folder, "other.example", 90)
+            offer = {"certificate": own[0].read_text(), "key": own[1].read_text(), "confirm": True, "reauth": PASSWORDS["admin"]}
+            answer = server.request(
+                call("VEXO.System", "SetCertificate"), "admin", body=json.dumps(offer), headers={"Content-Type": "application/json"})
+            self.assertTrue(answer.json["data"]["certificate"]["reloaded"])
+            self.assertEqual(shown(), offer["certificate"])
+            kept = on_disk()
+            make_certificate(folder, "third.example", 90)
+            with (server.home / "run/nginx.conf").open("a") as configuration:
+                configuration.write("no such directive;\n")
+            with self.assertRaisesRegex(AssertionError, "the certificate from before is in use again"):
+                server.cli("certificate", "set", *map(str, own))
+            self.assertEqual((shown(), on_disk()), (offer["certificate"], kept))
+            logs = "".join(file.read_text() for file in (server.home / "log").iterdir())
+            self.assertNotIn(offer["key"].splitlines()[1], logs)
 
     def test_client_comes_with_strict_headers(self):
         with Installation() as server:

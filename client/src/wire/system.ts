@@ -33,11 +33,33 @@ export interface Part {
 
 export interface Certificate {
   subject: string;
+  /** Hosts and addresses that it is valid for. */
+  name: string[];
   /** SHA-256, "AB:0C:…". */
   fingerprint: string;
   /** Unix seconds when it expires. */
   end: number;
   selfSigned: boolean;
+}
+
+export interface OfferedCertificate extends Certificate {
+  /** Names of hosts that would take this one for a stranger's. */
+  pairedHosts: string[];
+}
+
+/** Both in PEM. */
+export interface CertificateOffer {
+  certificate: string;
+  key: string;
+}
+
+export interface LogLevels {
+  category: { name: string; level: string }[];
+  /** The level of all others. */
+  others: string;
+  /** All levels that there are. */
+  known: string[];
+  revision: number;
 }
 
 export interface SystemStatus {
@@ -63,6 +85,8 @@ export interface SettingRecord {
 
 /** Another request waits for a while, and the checks take twelve seconds at most. */
 const kStatusTimeoutMs = 40_000;
+/** The web server has ten seconds to show another certificate, and as many to show the one from before again. */
+const kReloadTimeoutMs = 40_000;
 const kApi = "VEXO.System";
 
 export class System {
@@ -84,5 +108,28 @@ export class System {
   async set(name: string, value: SettingRecord["value"], revision: number): Promise<SettingRecord> {
     const json = { name, value, revision };
     return (await this.#server.call<{ setting: SettingRecord }>(kApi, "SetSetting", {}, { json })).setting;
+  }
+
+  /** Changes nothing. Rejects with a sentence for what is no usable pair. */
+  async checkCertificate(offer: CertificateOffer): Promise<OfferedCertificate> {
+    return (await this.#server.call<{ confirm: OfferedCertificate }>(kApi, "SetCertificate", {}, { json: offer })).confirm;
+  }
+
+  /** `reloaded`: the web server runs and shows it. Rejects with status 502 where it refuses: then the one from before is back. */
+  async setCertificate(offer: CertificateOffer, reauth: string): Promise<{ reloaded: boolean }> {
+    const options = { json: { ...offer, confirm: true, reauth }, timeoutMs: kReloadTimeoutMs };
+    return (await this.#server.call<{ certificate: { reloaded: boolean } }>(kApi, "SetCertificate", {}, options)).certificate;
+  }
+
+  async logLevels(): Promise<LogLevels> {
+    return (await this.#server.call<{ log: LogLevels }>(kApi, "LogLevels", {}, { json: {} })).log;
+  }
+
+  /** `changed` may have "others". Rejects with status 409 where `revision` is stale. */
+  async setLogLevels(changed: readonly { name: string; level: string }[], revision: number): Promise<LogLevels> {
+    const category = changed.filter(({ name }) => name !== "others");
+    const others = changed.find(({ name }) => name === "others")?.level;
+    const json = { category, revision, ...(others === undefined ? {} : { others }) };
+    return (await this.#server.call<{ log: LogLevels }>(kApi, "SetLogLevels", {}, { json })).log;
   }
 }

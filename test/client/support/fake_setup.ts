@@ -9,7 +9,7 @@ import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { HostRecord } from "../../../client/src/wire/hosts";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { UserRecord } from "../../../client/src/wire/accounts";
-import type { SettingRecord, SystemStatus } from "../../../client/src/wire/system";
+import type { LogLevels, OfferedCertificate, SettingRecord, SystemStatus } from "../../../client/src/wire/system";
 
 type Request = Record<string, never> & { id: number };
 type Answer = { status: number; success: boolean; data?: unknown; error?: unknown };
@@ -39,6 +39,9 @@ export class FakeSetup {
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
   readonly setting: SettingRecord[] = [];
   status: SystemStatus | null = null;
+  /** What is found in the files of a certificate; null where they are no pair. */
+  offered: OfferedCertificate | null = null;
+  log: LogLevels = { category: [], others: "error", known: ["debug", "error", "off"], revision: 1 };
   /** The answer of a probe. */
   probe: unknown = null;
   /** What a new limit deletes. */
@@ -71,6 +74,9 @@ export class FakeSetup {
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
     "VEXO.System.Status": () => ok(this.status),
     "VEXO.System.Settings": () => ok({ setting: this.setting }),
+    "VEXO.System.SetCertificate": (request) => this.#setCertificate(request),
+    "VEXO.System.LogLevels": () => ok({ log: this.log }),
+    "VEXO.System.SetLogLevels": (request) => this.#setLog(request),
     "VEXO.System.SetSetting": (request) => this.#setSetting(request),
   };
 
@@ -95,6 +101,24 @@ export class FakeSetup {
     const at = this.host.findIndex((one) => one.id === id);
     if (this.host[at]!.denial.length > 0 && !confirm) return ok({ confirm: this.host[at] });
     return this.#note("Server.Remove", request, ok({ removed: this.host.splice(at, 1)[0] }));
+  }
+
+  #setCertificate(request: Request): Answer {
+    const { confirm, reauth } = request as unknown as { confirm?: boolean; reauth?: string };
+    if (!this.offered) return failed(400, "the key is that of another certificate");
+    if (!confirm) return ok({ confirm: this.offered });
+    if (reauth !== "right") return failed(403, "your own password is wrong");
+    this.status!.certificate = this.offered;
+    return this.#note("SetCertificate", request, ok({ certificate: { ...this.offered, reloaded: true } }));
+  }
+
+  #setLog(request: Request): Answer {
+    const { revision, others = this.log.others, category } = request as unknown as LogLevels;
+    if (revision !== this.log.revision) return failed(409, "It was changed meanwhile.", this.log);
+    const level = (name: string) => category.find((one) => one.name === name)?.level;
+    const now = this.log.category.map((one) => ({ ...one, level: level(one.name) ?? one.level }));
+    this.log = { ...this.log, others, category: now, revision: revision + 1 };
+    return this.#note("SetLogLevels", request, ok({ log: this.log }));
   }
 
   #setSetting(request: Request): Answer {

@@ -120,5 +120,69 @@ TEST_F(SystemApi, ASettingIsChangedOnceAndWithinItsBounds) {
     EXPECT_EQ(entries[0]["object"], "players_per_session");
 }
 
+TEST_F(SystemApi, ACertificateIsReplacedByWhoGivesTheirPasswordAgain) {
+    const std::string folder = host_.Home().Home().string();
+    Shell("openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -days 90 -subj /CN=nvr -addext "
+          "subjectAltName=DNS:nvr,IP:192.0.2.7 -keyout " +
+          folder + "/own.key -out " + folder + "/own.pem 2>/dev/null");
+    const std::string key = base::ReadFile(folder + "/own.key");
+    Json::Value request;
+    request["certificate"] = base::ReadFile(folder + "/own.pem");
+    request["key"] = key;
+    const auto ask = [&] { return Ask("SetCertificate", request.toStyledString()); };
+    const Json::Value told = ask().Json()["data"]["confirm"];
+    EXPECT_EQ(told["name"][0], "nvr");
+    EXPECT_EQ(told["name"][1], "192.0.2.7");
+    EXPECT_TRUE(Status()["certificate"].isNull()) << "nothing was changed";
+    request["confirm"] = true;
+    EXPECT_EQ(ask().status, 403);
+    request["reauth"] = "wrong password";
+    EXPECT_EQ(ask().status, 403);
+    EXPECT_TRUE(Status()["certificate"].isNull());
+    request["reauth"] = "right password";
+    const Answer done = ask();
+    EXPECT_EQ(done.status, 200) << done.body;
+    EXPECT_EQ(done.Json()["data"]["certificate"]["reloaded"], false) << "no web server runs";
+    EXPECT_EQ(Status()["certificate"]["fingerprint"], told["fingerprint"]);
+    const Json::Value entries = Ask("Audit").Json()["data"]["entry"];
+    EXPECT_EQ(entries.size(), 1U);
+    EXPECT_EQ(entries[0]["after"]["fingerprint"], told["fingerprint"]);
+    const std::string part = key.substr(key.find('\n') + 1, 40);
+    EXPECT_EQ((done.body + entries.toStyledString()).find(part), std::string::npos) << "the key comes back";
+
+    request["key"] = request["certificate"];
+    EXPECT_EQ(ask().status, 400);
+    request.removeMember("key");
+    EXPECT_EQ(ask().status, 400);
+    EXPECT_EQ(Ask("SetCertificate&key=x", request.toStyledString()).status, 400) << "addresses end up in logs";
+}
+
+TEST_F(SystemApi, LogThresholdsAreSetByTheirNamesOnce) {
+    const Json::Value first = Ask("LogLevels").Json()["data"]["log"];
+    EXPECT_EQ(first["others"], "error");
+    const std::string revision = R"({"revision": )" + first["revision"].asString() + ", ";
+    const struct {
+        const char* body;
+        int status;
+    } rows[] = {
+        {R"("others": "loud"})", 400},
+        {R"("category": [{"name": "nothing", "level": "debug"}]})", 400},
+        {R"("category": [{"name": "512", "level": "debug"}]})", 400},
+        {R"("category": [{"name": "liveview"}]})", 400},
+        {R"("category": "liveview"})", 400},
+        {R"("others": "warning", "category": [{"name": "liveview", "level": "debug"}, {"name": "7", "level": "off"}]})",
+         200},
+        {R"("others": "debug"})", 409},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(Ask("SetLogLevels", revision + row.body).status, row.status) << row.body;
+    }
+    const Json::Value log = Ask("LogLevels").Json()["data"]["log"];
+    EXPECT_EQ(log["others"], "warning");
+    EXPECT_EQ(log["category"][0]["name"], "7");
+    EXPECT_EQ(log["category"][1]["level"], "debug");
+    EXPECT_EQ(Ask("Audit").Json()["data"]["entry"][0]["action"], "log.set");
+}
+
 }  // namespace
 }  // namespace lookhaven::api

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven setup-address: what it prints, whom it leaves it to, and that it stops once there is an account.
+// lookhaven setup-address: what it prints, whom it leaves it to, and that it stops once there is an account;
+// and lookhaven certificate, whose fingerprint it prints.
 #include <cstdlib>
 #include <fstream>
 #include <regex>
@@ -9,6 +10,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/host_name.h"
+#include "standalone/store/servers.h"
 #include "standalone/store/users.h"
 #include "test/component/cli/program.h"
 
@@ -77,6 +79,27 @@ TEST_F(SetupAddress, TellsTheFingerprintOfTheCertificate) {
     EXPECT_THAT(Run("setup-address --json").text, HasSubstr("\"fingerprint\" : \"" + fingerprint + "\""));
     std::ofstream(certificate) << "nothing";
     EXPECT_EQ(TokenIn(Run("setup-address").text), "valid");
+}
+
+TEST_F(SetupAddress, CertificatesAreReplacedOnceTheirFilesAreChecked) {
+    const std::string own = (home_ / "own").string();
+    ASSERT_EQ(
+        std::system(("openssl req -x509 -newkey rsa:2048 -nodes -subj /CN=nvr -keyout " + own + ".key -out " + own +
+                     ".pem 2>/dev/null && openssl req -x509 -newkey rsa:2048 -nodes -subj /CN=nvr -keyout " + own +
+                     "2.key -out " + own + "2.pem 2>/dev/null")
+                        .c_str()),
+        0);
+    Play({{"certificate show", 66, "there is no certificate yet"},
+          {"certificate set " + own + ".pem " + own + "2.key", 65, "that of another certificate"},
+          {"certificate set " + own + ".pem /nowhere.key", 66, "/nowhere.key"},
+          {"certificate set " + own + ".pem " + own + ".key", 0, "The web server does not run", "PRIVATE"},
+          {"certificate show", 0, "CN=nvr"},
+          {"certificate show --json", 0, "\"selfSigned\" : true", "PRIVATE"}});
+    store::Store store = Open();
+    store::RecordingServers(store).Add({.name = "Watcher"}, std::string(64, 'a'));
+    const std::string other = "certificate set " + own + "2.pem " + own + "2.key";
+    Play({{other, 65, "must be paired anew: Watcher"}, {other + " --confirm", 0, "To be paired anew: Watcher"}});
+    EXPECT_THAT(Run("audit").text, HasSubstr("certificate.set"));
 }
 
 TEST_F(SetupAddress, IsRefusedOnceThereIsAnAccount) {

@@ -22,7 +22,8 @@ export class Seen<Stored extends Revised & { name: string }> {
     } catch (error) {
       const { status, data } = asServerError(error);
       if (status !== 409 || typeof data !== "object" || data === null || !("revision" in data)) throw error;
-      this.#record = data as Stored;
+      // What is no record of many has no name there.
+      this.#record = { ...this.#record, ...(data as Stored) };
       return `Someone else has changed ${this.#record.name} in the meantime. Press ${this.#submit} again to go on all the same.`;
     }
   }

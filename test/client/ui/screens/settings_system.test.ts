@@ -66,7 +66,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const folder = { name: "folder", ok: true, finding: [], unchecked: null };
     const severity = "fault" as const;
     const mounts = { name: "mounts", ok: false, finding: [{ problem: "there is no mount", remedy: "lookhaven init", severity }], unchecked: null };
-    const certificate = { subject: "CN=nvr", fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
+    const certificate = { subject: "CN=nvr", name: ["nvr"], fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
     const recorder = { name: "recorder", state: "running" as const, since: 1_790_000_000, replaced: false };
     setup.status = { version: "1.2.3", store: { engine: "sqlite", schema: 7 }, part: [recorder], certificate, check: [folder, mounts] };
     const page = await open("system");
@@ -100,5 +100,50 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await side.fill("3");
     await page.getByRole("button", { name: "Cancel" }).click();
     await vi.waitFor(async () => expect(await side.inputValue()).toBe("8"));
+  }, 30_000);
+
+  test("a certificate is replaced once its files are checked and its price is told; log levels are set, nobody's lost", async () => {
+    const certificate = { subject: "CN=nvr", name: ["nvr"], fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
+    const store = { engine: "sqlite", schema: 7 };
+    setup.status = { version: "1.2.3", store, part: [], certificate, check: [] };
+    setup.log.category = [{ name: "liveview", level: "error" }, { name: "100", level: "off" }];
+    setup.offered = null;
+    const page = await open("system");
+    const dialog = page.locator("dialog[open]");
+    await page.getByRole("button", { name: "Replace the certificate…" }).click();
+    const check = dialog.getByRole("button", { name: "Check" });
+    await check.click();
+    await dialog.getByText("choose both files").waitFor();
+    const file = (name: string, bytes: number) => ({ name, mimeType: "application/x-pem-file", buffer: Buffer.alloc(bytes, "x") });
+    await dialog.getByLabel("Certificate").setInputFiles(file("own.pem", 40_000));
+    await dialog.getByLabel("Private key").setInputFiles(file("own.key", 4));
+    await check.click();
+    await dialog.getByText("too large").waitFor();
+    await dialog.getByLabel("Certificate").setInputFiles(file("own.pem", 8));
+    await check.click();
+    await dialog.getByText("that of another certificate").waitFor();
+    setup.offered = { ...certificate, fingerprint: "EF:01", selfSigned: false, pairedHosts: ["Watcher"] };
+    await check.click();
+    await dialog.getByText("1 host is paired by the certificate from before and must be paired anew: Watcher.").waitFor();
+    await dialog.getByText("EF:01").waitFor();
+    for (const [typed, told] of [["wrong", "your own password is wrong"], ["right", "The certificate is replaced."]] as const) {
+      await dialog.getByLabel("Your own password").fill(typed);
+      await dialog.getByRole("button", { name: "Replace", exact: true }).click();
+      await page.getByText(told).waitFor();
+    }
+    expect(setup.asked).toEqual([["SetCertificate", { certificate: "xxxxxxxx", key: "xxxx", confirm: true, reauth: "right" }]]);
+    await page.getByText("EF:01").waitFor();
+
+    await page.getByRole("button", { name: "Change log levels…" }).click();
+    setup.log = { ...setup.log, revision: 9 };
+    await dialog.getByLabel("Live view").selectOption("debug");
+    const saveIt = dialog.getByRole("button", { name: "Save" });
+    await saveIt.click();
+    await dialog.getByText("Someone else has changed the log levels").waitFor();
+    await saveIt.click();
+    await page.getByText("The log levels are saved.").waitFor();
+    expect(setup.asked[1]).toEqual(["SetLogLevels", { revision: 9, category: [{ name: "liveview", level: "debug" }] }]);
+    expect(setup.log.category).toEqual([{ name: "liveview", level: "debug" }, { name: "100", level: "off" }]);
+    await page.getByText("Category 100").waitFor();
   }, 30_000);
 });

@@ -8,6 +8,7 @@ import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { calendarDate } from "../../widgets/text";
+import { askForCertificate } from "./certificate_dialog";
 import { copyable } from "./copyable";
 import { commandOf, kKindNames, linesOf, partName, partText, storeText, summaryText, type Line } from "./system_text";
 
@@ -27,16 +28,20 @@ export class HealthPanel {
     if (this.root.childElementCount === 0) this.root.append(formPart("Health", text));
     try {
       const status = await this.#system.status(this.#closed);
-      if (!this.#closed.aborted) this.root.replaceChildren(...content(status));
+      if (!this.#closed.aborted) this.root.replaceChildren(...content(status, () => void this.#replaceCertificate()));
     } catch (error) {
       if (this.#closed.aborted) return;
       const message = element("p", { role: "alert" }, asServerError(error).message);
       this.root.replaceChildren(formPart("Health", message, button("Try again", () => void this.load())));
     }
   }
+
+  async #replaceCertificate(): Promise<void> {
+    if (await askForCertificate(this.root, this.#system)) await this.load();
+  }
 }
 
-function content(status: SystemStatus): HTMLElement[] {
+function content(status: SystemStatus, replaceCertificate: () => void): HTMLElement[] {
   const { version, store, part, certificate, check } = status;
   const lines = linesOf(check);
   const summary = element("p", { class: "health-summary", role: "status" }, summaryText(lines));
@@ -51,7 +56,11 @@ function content(status: SystemStatus): HTMLElement[] {
   return [
     formPart("Health", summary, ...list, ...rest),
     formPart("Parts", facts),
-    formPart("Certificate", ...certificateContent(certificate)),
+    formPart(
+      "Certificate",
+      ...certificateContent(certificate),
+      element("div", { class: "form-buttons" }, button("Replace the certificate…", replaceCertificate)),
+    ),
   ];
 }
 
@@ -66,11 +75,12 @@ function lineRow({ kind, check, text, remedy }: Line): HTMLElement {
 
 function certificateContent(certificate: Certificate | null): HTMLElement[] {
   if (!certificate) return [element("p", { class: "quiet" }, "The server has no certificate of its own that can be read.")];
-  const { subject, fingerprint, end, selfSigned } = certificate;
+  const { subject, name, fingerprint, end, selfSigned } = certificate;
   const hint = "Browsers ask once about a certificate that is self-signed, and show this fingerprint.";
   return [
     factList([
       ["Subject", subject],
+      ["Names", name.join(", ") || "none"],
       ["Expires", calendarDate(end * 1000)],
       ["Signed by", selfSigned ? "itself" : "an authority"],
     ]),

@@ -17,6 +17,7 @@ import { LoadedPage, type PageContext } from "../page";
 import { RecordForm } from "../record_form";
 import { copyable } from "./copyable";
 import { HealthPanel } from "./health_panel";
+import { LogPanel } from "./log_panel";
 import { SettingFields, settingLabel, type Values } from "./setting_fields";
 
 /** All that may be changed as one record; each setting has a revision of its own. */
@@ -32,6 +33,7 @@ const valuesOf = ({ settings }: Stored): Values =>
 export class SystemPage extends LoadedPage<SettingRecord[]> {
   readonly #system: System;
   readonly #health: HealthPanel;
+  readonly #log: LogPanel;
   #form: RecordForm<Values, Stored> | null = null;
 
   constructor(context: PageContext) {
@@ -39,11 +41,13 @@ export class SystemPage extends LoadedPage<SettingRecord[]> {
     super(context, "System", again);
     this.#system = new System(context.server);
     this.#health = new HealthPanel(this.#system, this.closed);
+    this.#log = new LogPanel(this.#system, this.closed);
     void this.start(
       () => this.#system.settings(),
       (settings) => {
         this.#showAll(settings, context.draft);
         void whileBusy(again, this.#health.load());
+        void this.#log.load();
       },
     );
   }
@@ -76,7 +80,7 @@ export class SystemPage extends LoadedPage<SettingRecord[]> {
     this.#form = form;
     const operators = formPart("On the server only", ...all.filter(({ operator }) => operator).map(operatorsSetting));
     const audit = linkButton("Audit log", settingsAddress("audit"));
-    this.show(this.#health.root, form.root, operators, formPart("Who changed what", audit));
+    this.show(this.#health.root, form.root, operators, this.#log.root, formPart("Who changed what", audit));
   }
 
   /** What was typed is given up. */

@@ -1,0 +1,80 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// How much the server logs of what it does, by category.
+
+import { asServerError } from "../../../wire/server";
+import type { LogLevels, System } from "../../../wire/system";
+import { button } from "../../widgets/button";
+import { element } from "../../widgets/dom";
+import { formPart, selectField, type Field } from "../../widgets/fields";
+import { openDialog } from "../../widgets/form_dialog";
+import { notify } from "../../widgets/notice";
+import { Seen } from "../seen";
+
+const kNames: Record<string, string> = { liveview: "Live view", player: "Players", others: "Everything else" };
+const kHint = "Messages of this level and more severe ones are logged. Levels hold at once, and until they are changed.";
+/** The most severe first. */
+const kOrder = ["off", "error", "warning", "notice", "info", "debug"];
+
+export class LogPanel {
+  readonly root = element("div", { class: "form-group" });
+  readonly #system: System;
+  readonly #closed: AbortSignal;
+
+  constructor(system: System, closed: AbortSignal) {
+    this.#system = system;
+    this.#closed = closed;
+  }
+
+  async load(): Promise<void> {
+    if (this.root.childElementCount === 0) this.#show(element("p", { class: "quiet", role: "status" }, "Loading…"));
+    try {
+      const levels = await this.#system.logLevels();
+      if (this.#closed.aborted) return;
+      const facts = entries(levels).map(([name, level]) =>
+        element("div", {}, element("dt", {}, labelOf(name)), element("dd", {}, level)),
+      );
+      const change = button("Change log levels…", () => void this.#change(levels));
+      this.#show(element("dl", { class: "mount-facts" }, ...facts), element("div", { class: "form-buttons" }, change));
+    } catch (error) {
+      if (this.#closed.aborted) return;
+      const again = button("Try again", () => void this.load());
+      this.#show(element("p", { role: "alert" }, asServerError(error).message), again);
+    }
+  }
+
+  #show(...content: Node[]): void {
+    this.root.replaceChildren(formPart("Log levels", ...content));
+  }
+
+  async #change(levels: LogLevels): Promise<void> {
+    const options = [...levels.known].sort((one, other) => kOrder.indexOf(one) - kOrder.indexOf(other));
+    const fields = entries(levels).map(([name, level]): [string, Field<string>] => {
+      const field = selectField(labelOf(name), options.map((one) => [one, one] as const));
+      field.value = level;
+      return [name, field];
+    });
+    const seen = new Seen({ ...levels, name: "the log levels" }, "Save");
+    const isDone = await openDialog(this.root, {
+      title: "Log levels",
+      content: [element("p", { class: "form-hint" }, kHint), ...fields.map(([, field]) => field.root)],
+      submit: "Save",
+      attempt: () => {
+        const wanted = fields.map(([name, field]) => ({ name, level: field.value }));
+        const changed = wanted.filter(({ name, level }) => level !== new Map(entries(levels)).get(name));
+        return seen.attempt(({ revision }) => this.#system.setLogLevels(changed, revision));
+      },
+    });
+    if (!isDone) return;
+    notify("The log levels are saved.");
+    await this.load();
+  }
+}
+
+function entries({ category, others }: LogLevels): [name: string, level: string][] {
+  return [...category.map(({ name, level }): [string, string] => [name, level]), ["others", others]];
+}
+
+function labelOf(name: string): string {
+  return kNames[name] ?? `Category ${name}`;
+}

@@ -1,0 +1,85 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/certificate_folder.h"
+
+#include <cstdio>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "standalone/base/file.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+constexpr const char* kCertificate = "certificate.pem";
+constexpr const char* kKey = "key.pem";
+constexpr const char* kUnfinished = "new";  // of packaging/prepare-web
+
+void Sync(const std::filesystem::path& folder) {
+    const base::FileDescriptor opened = base::OpenFile(folder, O_RDONLY | O_DIRECTORY);
+    if (::fsync(opened.Get()) != 0) {
+        base::ThrowErrno("cannot write " + folder.string());
+    }
+}
+
+}  // namespace
+
+CertificateFolder::CertificateFolder(const base::Installation& installation)
+    : home_(installation.Home()),
+      used_(installation.TlsFolder()),
+      other_(home_ / "tls.new"),
+      lock_(base::LockFile(installation.RunFolder() / "certificate.lock")) {}
+
+CertificateFolder::~CertificateFolder() {
+    std::error_code ignored;
+    std::filesystem::remove_all(other_, ignored);
+}
+
+std::string CertificateFolder::Certificates() const {
+    try {
+        return base::ReadFile(used_ / kCertificate);
+    } catch (const std::system_error&) {
+        return "";
+    }
+}
+
+void CertificateFolder::Prepare(const std::string& certificates, const std::string& key) const {
+    namespace fs = std::filesystem;
+    if (fs::is_symlink(used_)) {
+        throw store::InvalidRecord("the folder " + used_.string() + " is a link: replace the files where it leads");
+    }
+    fs::create_directory(used_);
+    fs::remove_all(other_);  // of a process that died
+    if (::mkdir(other_.c_str(), 0700) != 0) {
+        base::ThrowErrno("cannot make " + other_.string());
+    }
+    for (const fs::directory_entry& entry : fs::directory_iterator(used_)) {
+        const fs::path name = entry.path().filename();
+        if (name == kCertificate || name == kKey || name == kUnfinished) {
+            continue;
+        }
+        if (entry.is_symlink()) {
+            fs::copy_symlink(entry.path(), other_ / name);
+        } else if (entry.is_directory()) {
+            throw store::InvalidRecord("the folder " + used_.string() + " holds another folder, " + name.string() +
+                                       ": move that elsewhere first");
+        } else {
+            fs::create_hard_link(entry.path(), other_ / name);
+        }
+    }
+    base::WriteFileAtomically(other_ / kKey, key);
+    base::WriteFileAtomically(other_ / kCertificate, certificates);
+    Sync(other_);
+}
+
+void CertificateFolder::Exchange() const {
+    if (::renameat2(AT_FDCWD, other_.c_str(), AT_FDCWD, used_.c_str(), RENAME_EXCHANGE) != 0) {
+        base::ThrowErrno("cannot replace " + used_.string());
+    }
+    Sync(home_);
+}
+
+}  // namespace lookhaven::admin

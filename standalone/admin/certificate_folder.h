@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The web server's certificate and key on disk, replaced as one.
+//
+// Why so        Two files cannot be renamed in one step, and a certificate beside the key of another one keeps the web
+//               server from starting. So a whole folder is made beside theirs, and the two folders change places.
+// Invariants    (1) Whoever looks, whenever this process or the machine dies: the files of the folder belong together.
+//               (2) What else an owner keeps in the folder stays in it.
+// One at a time: the constructor waits for whoever else replaces them.
+#pragma once
+
+#include <filesystem>
+#include <string>
+
+#include "standalone/base/file_descriptor.h"
+#include "standalone/base/installation.h"
+
+namespace lookhaven::admin {
+
+class CertificateFolder {
+  public:
+    // Throws std::system_error, as each of these does.
+    explicit CertificateFolder(const base::Installation& installation);
+    // Removes what is not in use.
+    ~CertificateFolder();
+    CertificateFolder(const CertificateFolder&) = delete;
+    CertificateFolder& operator=(const CertificateFolder&) = delete;
+
+    // Empty where there is none that can be read.
+    std::string Certificates() const;
+    // Writes both, readable by the owner alone, to what is not in use. Throws store::InvalidRecord where the folder in
+    // use is a link or has folders in it, which are the owner's to take away.
+    void Prepare(const std::string& certificates, const std::string& key) const;
+    // What was prepared is in use, on the disk for good, and what was in use is not; the next call undoes that.
+    void Exchange() const;
+
+  private:
+    std::filesystem::path home_;
+    std::filesystem::path used_;
+    std::filesystem::path other_;
+    base::FileDescriptor lock_;
+};
+
+}  // namespace lookhaven::admin

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The installation's own web server, when what it has read has changed.
+#pragma once
+
+#include <stdexcept>
+#include <string>
+
+#include "standalone/base/installation.h"
+
+namespace lookhaven::admin {
+
+// The web server goes on as it was.
+class WebServerRefused : public std::runtime_error {
+  public:
+    using std::runtime_error::runtime_error;
+};
+
+// Lets the web server read its certificate anew, and waits until it shows the one of that fingerprint; its connections
+// go on. False where none runs: one that is started later reads it then. Throws WebServerRefused when another one
+// is still shown after ten seconds, or that cannot be seen.
+bool ReloadWebServer(const base::Installation& installation, const std::string& fingerprint);
+
+}  // namespace lookhaven::admin
