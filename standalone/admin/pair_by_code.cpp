@@ -27,7 +27,12 @@ CannotPair Failed(Reason why) {
     case Reason::kCode:
         return {why, "the code is not valid there: it is used up, older than ten minutes, or replaced by a newer one"};
     case Reason::kTooMany:
-        return {why, "the other host takes no code from here now, after too many attempts; try again in a minute"};
+        return {why,
+                "the code is wrong, or too much was asked of the other host at once: compare it, or show a new one"};
+    case Reason::kUnclear:
+        return {why,
+                "the other host's answer cannot be used: the code may be used up, and a pairing that it had under this "
+                "name may have ended; show a new code there"};
     }
     throw std::logic_error("an unknown reason");
 }
@@ -74,9 +79,9 @@ Offer Accept(const store::RecordingServer& server, const remote::PairingCode& co
     } catch (const remote::NoAnswer& refusal) {
         throw Failed(refusal.status == kForbidden ? Reason::kCode
                      : refusal.status == kTooMany ? Reason::kTooMany
-                                                  : Reason::kUnreachable);
+                                                  : Reason::kUnclear);
     } catch (const Json::Exception&) {
-        throw Failed(Reason::kUnreachable);
+        throw Failed(Reason::kUnclear);
     }
 }
 

@@ -12,7 +12,7 @@
 
 namespace lookhaven::admin {
 
-// Nothing was changed here. Whoever may pair can name any address that this machine reaches, so the text says no more
+// Nothing was changed here; there, with kUnclear, a pairing may have been made. Whoever may pair can name any address that this machine reaches, so the text says no more
 // of what answers there than the reason.
 class CannotPair : public std::runtime_error {
   public:
@@ -20,7 +20,8 @@ class CannotPair : public std::runtime_error {
         kUnreachable,  // no web server with TLS, or one that does not know how to pair by a code
         kCertificate,  // it shows another certificate, or one that has expired
         kCode,         // wrong, used, expired, or replaced by a newer one
-        kTooMany,      // too many codes were tried there from this host's network within a minute
+        kTooMany,      // wrong, after many others from this host's network; or its web server was asked too much
+        kUnclear,      // the code was sent, and may be used up there
     };
 
     CannotPair(Reason why, const std::string& text) : std::runtime_error(text), why_(why) {}

@@ -89,7 +89,9 @@ Json::Value Make(store::Store& store, const User& before, const UserChange& chan
     Users users(store);
     if (change.password) {
         users.SetPassword(before.id, *change.password);
-        VoidInvitationOf(store, before.id);
+    }
+    if (change.password || change.privilege || change.denials) {
+        VoidInvitationOf(store, before.id);  // as they end the account's sessions
     }
     if (change.privilege && *change.privilege != before.privilege) {
         users.SetPrivilege(before.id, *change.privilege);

@@ -127,6 +127,8 @@ const char* NameOf(admin::CannotPair::Reason reason) {
         return R"({"reason":"code"})";
     case admin::CannotPair::Reason::kTooMany:
         return R"({"reason":"tooMany"})";
+    case admin::CannotPair::Reason::kUnclear:
+        return R"({"reason":"unclear"})";
     }
     return "null";
 }

@@ -107,9 +107,11 @@ export class Player {
     else this.#showStill(start);
   }
 
-  play(): void {
+  /** Plays on; the first frame is due at its own time, or at that one if it is later. */
+  play(dueFromMs = -Infinity): void {
     if (!this.#footage || this.#state.kind === "playing") return;
-    void this.#play(this.#wanted ?? this.#opening ?? { index: this.#state.kind === "ended" ? 0 : this.index });
+    const start = this.#wanted ?? this.#opening ?? { index: this.#state.kind === "ended" ? 0 : this.index };
+    void this.#play(start, dueFromMs);
   }
 
   pause(): void {
@@ -210,10 +212,10 @@ export class Player {
     return !failure;
   }
 
-  async #play(start: Start): Promise<void> {
+  async #play(start: Start, dueFromMs = -Infinity): Promise<void> {
     const signal = this.#begin();
     this.#opening = start;
-    this.#shown.begin("atMs" in start ? start.atMs : -Infinity);
+    this.#shown.begin("atMs" in start ? start.atMs : dueFromMs);
     this.#stills.forget();
     this.#become({ kind: "opening" });
     const first = await this.#locate(start, signal);

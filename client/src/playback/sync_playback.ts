@@ -11,7 +11,7 @@ import type { Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import type { FootageCache } from "./footage_cache";
 import { covers, FootageLookup, kMaxGapS } from "./footage_lookup";
-import { Tracks, type Track } from "./tracks";
+import { kActive, Tracks, type Track } from "./tracks";
 
 /** How often at most a player that was left behind is brought back. */
 const kRejoinIntervalMs = 5_000;
@@ -180,7 +180,7 @@ export class SyncPlayback {
   /** Of what is still being recorded, the cache does not know the end yet: what leads is opened again all the same. */
   #reopen(atMs: number): void {
     const { footage, state } = this.#lead?.player ?? {};
-    if (footage?.isGrowing && state?.kind === "playing") this.open(footage, atMs);
+    if (footage?.isGrowing && state && kActive.includes(state.kind)) this.open(footage, atMs);
     else this.seek(atMs);
   }
 

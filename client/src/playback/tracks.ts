@@ -12,7 +12,7 @@ export interface Track {
   readonly player: Player;
 }
 
-const kActive: readonly string[] = ["opening", "playing", "lost"];
+export const kActive: readonly string[] = ["opening", "playing", "lost"];
 
 export class Tracks {
   readonly clock = new PlaybackClock();
@@ -83,7 +83,7 @@ export class Tracks {
     const { state, footage } = track.player;
     if (state.kind !== "paused" || !footage) return false;
     this.#enter(track, footage, atMs);
-    track.player.play();
+    track.player.play(atMs);
     return true;
   }
 

@@ -46,6 +46,19 @@ describe("a player", () => {
     expect(archive.asked[1]).toBe("event7 frame 0 to -1 at 1");
   });
 
+  test("a picture that was taken before the playhead is due at the playhead, also after a pause", async () => {
+    const dueMs: number[] = [];
+    player.pace = async (positionMs) => dueMs.push(positionMs) > 0;
+    player.open(footage(7), 1_005_070, true);
+    await untilFrame(51);
+    player.pause();
+    const pausedMs = player.timeMs;
+    expect(dueMs[0]).toBe(1_005_070);
+    dueMs.length = 0;
+    player.play(pausedMs + 30);
+    await vi.waitFor(() => expect(dueMs[0]).toBe(pausedMs + 30));
+  });
+
   test("pause closes the stream; steps stay within the recording and end at the last one asked for", async () => {
     player.open(footage(7), 0, true);
     await untilFrame(3);
