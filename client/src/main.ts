@@ -5,7 +5,7 @@
 //   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
 //              groups, emap_setup, devices, accounts, mounts, system, audit), the parts of an endless answer (multipart), files that are
 //              sent (upload), requests that end in time (deadline) and take turns (semaphore)
-//   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
+//   live/      what is reported, as it is (alert_watch); live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
 //              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
 //              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
 //   playback/  recordings: what is known of them (footage_cache, footage_lookup, recorded_days); a player plays one,

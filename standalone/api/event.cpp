@@ -13,6 +13,7 @@
 #include "standalone/api/export.h"
 #include "standalone/api/footage.h"
 #include "standalone/api/keep.h"
+#include "standalone/api/watch.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
@@ -232,6 +233,7 @@ std::string Next(const Call& call) {
 
 constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Effect::kChanges},
                                {"List", List},
+                               {"Watch", Watch},
                                {"Get", Get},
                                {"Next", Next},
                                {"Frame", TellFrame},

@@ -26,10 +26,16 @@ Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event
 // Of several, with one question to the store.
 Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::Event>& events);
 
+// Whether the caller may know of it.
+template <typename AnyEvent>
+bool IsVisible(const AnyEvent& event) {
+    return binding::MayUse(event.camera_id, store::CameraAccess::kPlayback);
+}
+
 // Throws Failure 404 where there is none, or not for the caller.
 template <typename AnyEvent>
 void RequireVisible(const std::optional<AnyEvent>& event) {
-    if (!event || !binding::MayUse(event->camera_id, store::CameraAccess::kPlayback)) {
+    if (!event || !IsVisible(*event)) {
         throw Failure(404, "there is no such event");
     }
 }

@@ -5,9 +5,11 @@
 #include <chrono>
 #include <set>
 #include <thread>
+#include <utility>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
+#include "standalone/store/marks.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 
@@ -50,9 +52,14 @@ void Watch(const base::Installation& installation, control::SlotTable& slots, Se
     store::Store records = store::Store::Open(installation.StoreUrl());
     filter.Learn(store::Sessions(records).Key());
     PurgeSchedule purges;
+    int newest = 0;
     for (;; std::this_thread::sleep_for(kPeriod)) {
         const std::int64_t now_s = base::WallSeconds();
         Look(records, slots, now_s);
+        // Any host of the store, and the command line, may have reported it.
+        if (const int id = store::Marks(records).NewestId(); std::exchange(newest, id) != id) {
+            slots.NoteReport();
+        }
         // The wall clock may be set back by years.
         if (const std::int64_t uptime_s = base::MonotonicMicros() / 1'000'000; purges.IsDue(uptime_s)) {
             purges.NoteAttempt(uptime_s, TryToPurge(records, now_s));

@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/futex.h"
 
 namespace lookhaven::control {
 
@@ -17,15 +18,8 @@ namespace lookhaven::control {
 struct alignas(Slot) SlotTable::Guard {
     pthread_mutex_t mutex;
     std::atomic<std::size_t> used;  // slots, from the first on
+    std::atomic<std::uint32_t> reports;
 };
-
-namespace {
-
-std::string_view TextIn(const std::array<char, 64>& text) {
-    return {text.begin(), std::ranges::find(text, '\0')};  // a process that was taken over may have left no end
-}
-
-}  // namespace
 
 SlotTable::SlotTable(std::size_t slots) : wake_(::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)) {
     const std::size_t size_bytes = sizeof(Guard) + slots * sizeof(Slot);
@@ -112,28 +106,12 @@ void SlotTable::KeepOnly(const Slot& slot) {
     wake_.Reset();
 }
 
-void SlotTable::SetCall(Slot& slot, std::string_view call) {
-    slot.has_call = false;
-    slot.call.fill('\0');
-    call.copy(slot.call.data(), slot.call.size() - 1);
-    slot.has_call = true;
-}
-
 void SlotTable::VisitRunning(const std::function<void(const Slot&)>& visit) const {
     for (const Slot& slot : Used()) {
         if (slot.serial != 0) {
             visit(slot);
         }
     }
-}
-
-void SlotTable::SetSession(Slot& slot, std::string_view handle) {
-    if (handle.size() >= slot.session.size()) {
-        throw std::length_error("a session handle is too long");
-    }
-    slot.session.fill('\0');
-    handle.copy(slot.session.data(), handle.size());
-    slot.has_session = true;
 }
 
 std::size_t SlotTable::CountOthers(const Slot& slot, const std::function<bool(const Slot&)>& counts) const {
@@ -205,6 +183,26 @@ Admission SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_
     return Admission::kGranted;
 }
 
+bool SlotTable::BeginWatch(Slot& slot, std::size_t max_of_user) {
+    const SharedLock lock = TryLock(guard_->mutex);
+    const auto counts = [user = slot.user.load()](const Slot& each) {
+        return each.work == Work::kWatch && each.user == user;
+    };
+    if (!lock || CountOthers(slot, counts) >= max_of_user) {
+        return false;
+    }
+    slot.work = Work::kWatch;
+    return true;
+}
+
+const std::atomic<std::uint32_t>& SlotTable::Reports() const {
+    return guard_->reports;
+}
+
+void SlotTable::NoteReport() {
+    base::Wake(guard_->reports);
+}
+
 std::set<std::string> SlotTable::Sessions() const {
     std::set<std::string> sessions;
     for (const Slot& slot : Used()) {
@@ -274,19 +272,6 @@ void SlotTable::ClearWake() {
 void SlotTable::SetWakeDescriptor(int descriptor) {
     wake_.Release();
     wake_.Reset(descriptor);
-}
-
-std::string_view SessionOf(const Slot& slot) {
-    return slot.has_session ? TextIn(slot.session) : std::string_view{};
-}
-
-std::string_view CallOf(const Slot& slot) {
-    const std::string_view call = slot.has_call ? TextIn(slot.call) : std::string_view{};
-    // The slot is its process's to write.
-    const bool is_name = std::ranges::all_of(call, [](char c) {
-        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '/';
-    });
-    return is_name ? call : std::string_view{};
 }
 
 }  // namespace lookhaven::control

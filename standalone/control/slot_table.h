@@ -61,6 +61,7 @@ enum class Work : std::uint8_t {
     kSearch,   // may take seconds of a processor
     kProbing,  // of a camera, or a stranger's picture, by a process of its own
     kExport,   // of footage; a search, too, until its answer turns out to be a stream
+    kWatch,    // of what is being reported, for as long as the client likes
 };
 
 // How many passwords are hashed at once, in 64 MiB each. Requests admitted as a user's leave the rest to log-ins.
@@ -125,7 +126,7 @@ class SlotTable {
     // Of the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
-    // For a request process, five ways to occupy something, each in one step among all processes: however many try at
+    // For a request process, six ways to occupy something, each in one step among all processes: however many try at
     // once, no more than the limit succeed.
     //
     // The request is the user's from here on. Counted are admitted requests.
@@ -139,6 +140,12 @@ class SlotTable {
     bool BeginProbing(Slot& slot, std::size_t max_in_all);
     // Of its user's exports, until the process ends. kGranted, or for lack of room nothing is changed.
     Admission BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
+    // One of its user's watches, and no search any more, until the process ends. False: no room.
+    bool BeginWatch(Slot& slot, std::size_t max_of_user);
+
+    // Changes, and wakes those who sleep on it, after something was reported: what to ask the store for is not said.
+    const std::atomic<std::uint32_t>& Reports() const;
+    void NoteReport();
 
     // The sessions of running requests, unless they must end anyway.
     std::set<std::string> Sessions() const;

@@ -172,6 +172,30 @@ std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) 
     return next;
 }
 
+std::vector<Mark> Marks::ReportedAfter(int id, int limit) {
+    return connection_.FetchAll<Mark>("where id > :id and demo = 0 order by id limit :limit", id, limit);
+}
+
+std::vector<Marks::Report> Marks::ReportsBetween(int after, int before, int limit) {
+    std::vector<Report> reports;
+    for (const auto& [id, camera, reported_s] : connection_.FetchAll<std::tuple<int, int, std::int64_t>>(
+             "select id, camera_id, reported_s from marks where id > :after and id < :before and demo = 0"
+             " order by id desc limit :limit",
+             after, before, limit)) {
+        reports.push_back({id, camera, reported_s});
+    }
+    return reports;
+}
+
+int Marks::NewestId() {
+    return connection_.FetchOne<int>("select id from marks order by id desc limit 1").value_or(0);
+}
+
+int Marks::LastId() {
+    return static_cast<int>(
+        connection_.FetchOne<std::int64_t>("select value from counters where name = 'event'").value());
+}
+
 std::vector<Mark> Marks::Pending() {
     return connection_.FetchAll<Mark>("where state = 0 order by end_s");
 }

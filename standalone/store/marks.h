@@ -107,6 +107,20 @@ class Marks {
     std::vector<Mark> List(const MarkFilter& filter);
     // As Events::Next, among saved marks; of one kind, or of both.
     std::optional<Mark> Next(const Step& step, std::optional<MarkKind> kind);
+    // In the order of being reported, which is that of their ids: whoever draws an id holds the counter until the commit,
+    // so none becomes visible after a larger one. Without demo marks.
+    std::vector<Mark> ReportedAfter(int id, int limit);
+    struct Report {
+        int id = 0;
+        int camera_id = 0;
+        std::int64_t reported_s = 0;
+    };
+    // Those between the two ids, the newest first. Without demo marks.
+    std::vector<Report> ReportsBetween(int after, int before, int limit);
+    // The largest id of a mark; 0 for none. Costs next to nothing.
+    int NewestId();
+    // The largest id that was ever given to a mark or a recorded event.
+    int LastId();
     // What the recorder has to save, by the end of the span. Costs nothing when there is none.
     std::vector<Mark> Pending();
     // Marks of the camera whose footage ended at or before that time, by start and id, without demo and pending ones:

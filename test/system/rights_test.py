@@ -58,6 +58,7 @@ POST Event.Mark kind=alert camera={camera}                            E      E  
 Event.List cameralists={camera}: event                                E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Event.List cameralists={camera} text=coffee: event                    E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
 Event.List text=coffee: event                                         E      E     D       O     D    D       D        D      D       E
+Event.Watch after=0-now: event                                        E      E     D       O     D    D       D        D      D       E
 Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N    D/N     E
 Event.Next cameralists={camera} time=-1d: event                       E      E     D/O     O     D/O  D/O     D/O      D/O    D/O     E
@@ -122,6 +123,23 @@ def camera_2(data):
     return any(2 in each["camera"] for each in next(iter(data.values())))
 
 
+def watched_camera_2(response):
+    """Whether what was missed tells of it."""
+    missed = None
+    for line in iter(response.readline, b""):
+        if line.startswith(b"data: "):
+            data = json.loads(line[6:])
+            if missed is None:
+                missed = data["missed"]
+            else:
+                missed -= 1
+                if data["camera_id"] == 2:
+                    return True
+            if missed == 0:
+                return False
+    return False
+
+
 # Whether an answer's data tells of what stands behind the colon, by method.
 TELLS = {
     ("CameraStates", "camera"): lambda data: any(one["id"] == 2 for one in data["camera"]),
@@ -182,7 +200,8 @@ class RightsTest(unittest.TestCase):
     def ask(self, is_post, request, told, caller, **objects):
         """The outcome's letter, and all of the answer that must not tell a hidden object from an absent one."""
         now = int(time.time())
-        words = {"-1d": now - 86400, "now": now, "now_ms": now * 1000, "own": PASSWORDS.get(caller, "none")}
+        words = {"-1d": now - 86400, "now": now, "now_ms": now * 1000, "0-now": f"0-{now}",
+                 "own": PASSWORDS.get(caller, "none")}
         given = dict(word.format(**objects).split("=") for word in request.split()[1:])
         given = {name: words.get(value, value) for name, value in given.items()}
         api, method = api_and_method(request)
@@ -199,6 +218,8 @@ class RightsTest(unittest.TestCase):
             if kind.startswith("multipart/"):
                 codecs = Parts(connection, response).next()[0].get("x-codecs", ";")
                 return "D" if codecs.endswith(";") else "S", None
+            if kind == "text/event-stream":
+                return "D" if watched_camera_2(response) else "O", None
             body = response.read(1 << 20)
             letter = {200: "D", 302: "R", **LETTERS}.get(response.status, "?")
             if response.status == 200 and kind == "application/json":

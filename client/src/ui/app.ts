@@ -2,7 +2,11 @@
 //
 // Goes from the log-in, or the first account, to the screens, from screen to screen as the address says, and back to the log-in.
 
+import { watchAlerts } from "../live/alert_watch";
+import { streamLimit } from "../live/stream_budget";
+import { protocol } from "../wire/protocol";
 import { Server, type Account } from "../wire/server";
+import { isKindChosen } from "./events/event_filter";
 import { EventsScreen } from "./screens/events_screen";
 import { keepTrying } from "./screens/keep_trying";
 import { loginScreen } from "./screens/login_screen";
@@ -31,6 +35,7 @@ export class App {
   #remembered = rememberedFor(0);
   /** Null at the log-in. */
   #screen: Screen | null = null;
+  #watching: AbortController | null = null;
   /** As long as the server has none. */
   #isWithoutAccounts = false;
 
@@ -65,6 +70,7 @@ export class App {
     if (this.#screen === null && this.#root.querySelector(".login-form")) return;
     this.#screen?.close();
     this.#screen = this.#account = null;
+    this.#watching?.abort();
     hideNotice();
     if (setupToken() !== null) leaveSetup(location.pathname + location.search);
     titleScreen("Log in");
@@ -95,7 +101,13 @@ export class App {
   #showScreens(account: Account): void {
     this.#isWithoutAccounts = false;
     this.#account = account;
-    if (this.#remembered.userId !== account.user_id) this.#remembered = rememberedFor(account.user_id);
+    if (this.#remembered.userId !== account.user_id) {
+      this.#remembered = rememberedFor(account.user_id);
+      this.#server.alerts.forget();
+    }
+    this.#watching?.abort();
+    this.#watching = new AbortController();
+    void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, isKindChosen, this.#watching.signal);
     this.#followRoute();
   }
 

@@ -2,6 +2,7 @@
 //
 // The web API as the client uses it: typed answers, and for each failure one sentence for the user.
 
+import { Alerts } from "./alerts";
 import { Deadline } from "./deadline";
 import { SignalLosses } from "./signal_losses";
 import { postFile, type UploadOptions } from "./upload";
@@ -108,6 +109,8 @@ async function failureOf(answer: Response): Promise<ServerError> {
 }
 
 export class Server {
+  /** As of now, while they are watched. */
+  readonly alerts = new Alerts();
   /** As of the last refresh. */
   readonly signalLosses = new SignalLosses(this);
   readonly #onSessionEnd: () => void;

@@ -59,6 +59,7 @@ export class LargeView {
       () => this.#showState(),
       true,
     );
+    this.#picture.reported = () => server.alerts.kindAt(camera);
     magnify(this.#picture.root, this.#picture.canvas);
     if (still?.hasPicture) this.#picture.showStill(still.canvas);
     this.#name = element("h1", { class: "large-name", tabindex: "-1", title: camera.name }, camera.name);

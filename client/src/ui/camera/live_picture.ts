@@ -30,6 +30,9 @@ export class LivePicture {
   readonly #canLink: boolean;
   /** Why the camera is absent; empty for one that is there. */
   absence = "";
+  /** What was just reported of the camera, for which the picture has a frame; null for nothing. */
+  reported: () => "alert" | "pos" | null = () => null;
+  readonly #frame = element("p", { class: "picture-frame", hidden: true });
   readonly #sentence = element("p", { class: "message-sentence" });
   readonly #reason = element("p", { class: "message-reason" });
   readonly #hint = element("p", { class: "hint", role: "note" });
@@ -71,7 +74,7 @@ export class LivePicture {
       this.#sentence,
       this.#reason,
     );
-    this.root = element("div", { class: "picture" }, this.canvas, message, this.#hint);
+    this.root = element("div", { class: "picture" }, this.canvas, message, this.#hint, this.#frame);
   }
 
   state(): PictureState {
@@ -118,6 +121,9 @@ export class LivePicture {
     const noStills = "The server has no still pictures of this camera.";
     setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
     this.#showHint(isThere ? this.#unplayable() : null);
+    const reported = this.reported();
+    this.#frame.hidden = reported === null;
+    setText(this.#frame, reported === null ? "" : reported === "pos" ? "POS" : "Alert");
     const shown = state.kind === "lost" ? `${state.kind} ${state.reason}` : state.kind;
     if (shown !== this.#shown) {
       this.#shown = shown;

@@ -154,6 +154,11 @@ export class EventFilter {
   }
 }
 
+/** Whether the user has chosen to see this kind, as far as is kept. */
+export function isKindChosen(kind: EventKind): boolean {
+  return readStored().kinds?.includes(kind) ?? true;
+}
+
 function readStored(): Partial<FilterChoice> {
   try {
     return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Partial<FilterChoice> | null) ?? {};

@@ -16,6 +16,7 @@ import { kEventsKeys, pressEventsKey, type EventsActions } from "../events/event
 import { EventsLayout } from "../events/events_layout";
 import { ExportPanel } from "../events/export_panel";
 import { KeepButton } from "../events/keep_button";
+import { tellNewEvents } from "../events/new_events";
 import { Overview } from "../events/overview";
 import { Scrubbing } from "../events/scrubbing";
 import { Stage } from "../events/stage";
@@ -116,6 +117,7 @@ export class EventsScreen extends Screen {
     this.every(kRefreshMs, () => this.#refresh());
     this.every(kReloadIntervalMs, () => this.#overview.reload());
     this.every(kDaysIntervalMs, () => this.#overview.forgetDays());
+    tellNewEvents(this.server.alerts, this.closed);
     void this.#load();
   }
 

@@ -2,7 +2,8 @@
 //
 // The links from screen to screen, in the bar of each.
 
-import { element } from "../widgets/dom";
+import type { Alerts } from "../../wire/alerts";
+import { element, setText } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 import type { ScreenName } from "./route";
 
@@ -13,12 +14,26 @@ const kLinks: [ScreenName, IconName, label: string, href: string][] = [
   ["settings", "settings", "Settings", "#settings"],
 ];
 
-/** Those who are no managers have no settings. */
-export function navigation(current: ScreenName, isManager: boolean): HTMLElement {
+/** How many events are new, beside the link to them. */
+function badge(alerts: Alerts, closed: AbortSignal): HTMLElement {
+  const root = element("span", { class: "nav-badge" });
+  const show = () => {
+    root.hidden = alerts.count === 0;
+    setText(root, alerts.count > 99 ? "99+" : String(alerts.count));
+    root.title = `${alerts.count} new since you looked`;
+  };
+  alerts.listen(show, closed);
+  show();
+  return root;
+}
+
+/** Those who are no managers have no settings. Kept up to date until `closed` is aborted. */
+export function navigation(current: ScreenName, isManager: boolean, alerts: Alerts, closed: AbortSignal): HTMLElement {
   const links = kLinks
     .filter(([screen]) => isManager || screen !== "settings")
     .map(([screen, name, label, href]) => {
       const link = element("a", { class: "nav-link", href }, icon(name), element("span", {}, label));
+      if (screen === "events") link.append(badge(alerts, closed));
       if (screen === current) link.setAttribute("aria-current", "page");
       return link;
     });

@@ -40,7 +40,7 @@ export abstract class Screen {
     const keys = iconButton("keys", "Keys", () => this.#keysDialog.show(this.keys), "?");
     keys.classList.add("show-keys");
     const account = new AccountMenu(session, () => this.canLeave(), (isBusy) => (this.progress.hidden = !isBusy));
-    const links = navigation(name, session.account.is_manager);
+    const links = navigation(name, session.account.is_manager, this.server.alerts, this.closed);
     const bar = element("header", { class: "bar" }, brand, links, this.#clock, keys, account.button);
     this.front = element("div", { class: `front ${name}` }, bar, this.progress);
     this.root = element("main", { class: "screen" }, this.front, this.#keysDialog.root, account.root);

@@ -49,6 +49,7 @@ export class Tile {
       false,
     );
     this.picture.absence = absence;
+    this.picture.reported = () => server.alerts.kindAt(camera);
     this.#open.disabled = absence !== "";
     this.#open.addEventListener("click", () => actions.open(camera));
     // The button lies over the picture, whose messages are not its label.

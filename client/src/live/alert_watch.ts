@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Keeps the stream of what is being reported open, and goes on where it was after each loss of the connection.
+//
+// Why so        Over HTTP/1.1 a stream would hold one of the browser's six connections for good. There it is opened every
+//               few seconds instead, and closed when it has told what was missed.
+
+import { Deadline } from "../wire/deadline";
+import { delay } from "../wire/delay";
+import { EventStreamParser, type StreamEvent } from "../wire/event_stream";
+import type { RawMark } from "../wire/footage";
+import type { Server } from "../wire/server";
+import { Backoff } from "./backoff";
+
+/** Longer than two of the server's comments apart. */
+const kMaxSilenceMs = 40_000;
+const kPauseMs = 5_000;
+/** What happened longer ago was missed. */
+const kFreshS = 60;
+
+/** Runs until `signal` is aborted. Kinds that `admits` refuses are left out. */
+export async function watchAlerts(
+  server: Server,
+  isBrief: boolean,
+  admits: (kind: RawMark["kind"]) => boolean,
+  signal: AbortSignal,
+): Promise<void> {
+  const backoff = new Backoff();
+  let place = "";
+  while (!signal.aborted) {
+    let isTold = false;
+    const deadline = new Deadline(kMaxSilenceMs, signal);
+    let missed = 0;
+    let nowS = 0;
+    const take = ({ name, id, data }: StreamEvent) => {
+      if (name === "start") {
+        const start = JSON.parse(data) as { missed: number; time: number };
+        [missed, nowS] = [start.missed, start.time - performance.now() / 1000];
+      } else if (name === "mark") {
+        const mark = JSON.parse(data) as RawMark;
+        missed -= 1;
+        if (admits(mark.kind)) server.alerts.note(mark, mark.time > nowS + performance.now() / 1000 - kFreshS);
+      }
+      place = id;
+      backoff.reset();
+      isTold = isBrief && missed <= 0;
+    };
+    try {
+      const answer = await server.media("VEXO.Event", "Watch", place ? { after: place } : {}, deadline);
+      const parser = new EventStreamParser(take);
+      const reader = answer.body!.getReader();
+      for (let read = await reader.read(); !read.done && !isTold && !signal.aborted; read = await reader.read()) {
+        deadline.extend();
+        parser.push(read.value);
+        if (isTold) break;
+      }
+    } catch {
+      // The next attempt goes on where this one was.
+    } finally {
+      deadline.release();
+    }
+    await delay(isTold ? kPauseMs : backoff.next(), signal);
+  }
+}

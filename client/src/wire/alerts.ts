@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What was reported since the user looked, and at which cameras just now.
+
+import type { RawMark } from "./footage";
+import type { Camera } from "./server";
+
+/** How long a camera's picture has its frame. */
+export const kFrameMs = 10_000;
+
+export class Alerts {
+  readonly #listeners = new Set<() => void>();
+  readonly #latest = new Map<number, { kind: RawMark["kind"]; untilMs: number }>();
+  #count = 0;
+
+  /** How many the user has not seen yet. */
+  get count(): number {
+    return this.#count;
+  }
+
+  /** `isFresh`: it happens now, rather than having been missed. */
+  note(mark: RawMark, isFresh: boolean): void {
+    this.#count += 1;
+    if (isFresh) this.#latest.set(mark.camera_id, { kind: mark.kind, untilMs: performance.now() + kFrameMs });
+    this.#tell();
+  }
+
+  /** The user looks at the events; returns how many are new. */
+  look(): number {
+    const count = this.#count;
+    this.#count = 0;
+    if (count > 0) this.#tell();
+    return count;
+  }
+
+  /** What the camera's picture has a frame for; null for none, and for another server's camera. */
+  kindAt({ id, server }: Pick<Camera, "id" | "server">): RawMark["kind"] | null {
+    const latest = server ? undefined : this.#latest.get(id);
+    return latest && performance.now() < latest.untilMs ? latest.kind : null;
+  }
+
+  /** Of another account nothing is known. */
+  forget(): void {
+    this.#latest.clear();
+    this.look();
+  }
+
+  /** Calls `changed` after each change of the count, until `signal` is aborted. */
+  listen(changed: () => void, signal: AbortSignal): void {
+    this.#listeners.add(changed);
+    signal.addEventListener("abort", () => this.#listeners.delete(changed));
+  }
+
+  #tell(): void {
+    for (const changed of this.#listeners) changed();
+  }
+}

@@ -1,0 +1,174 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Why so        A watch costs nothing while nothing happens: it sleeps on a word that the watcher of sessions changes
+//               when the store has a new mark, whichever host reported it. Where nobody changes it, the store is asked
+//               with each heartbeat.
+// Invariants    (1) The rights of the caller are asked for with each mark, as of then. What is hidden from the caller
+//                   moves no id that is sent.
+//               (2) The store is closed while something is sent or waited for.
+//               (3) No more than a page of marks is held, however slow the client reads: one that takes no byte for
+//                   30 seconds is left.
+#include "standalone/api/watch.h"
+
+#include <algorithm>
+#include <charconv>
+#include <chrono>
+#include <limits>
+#include <optional>
+#include <string_view>
+
+#include "standalone/api/event_json.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/futex.h"
+#include "standalone/base/json_text.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr std::size_t kMaxWatchesOfUser = 16;
+constexpr std::chrono::seconds kHeartbeat{15};
+constexpr std::int64_t kMaxAwaySeconds = 86'400;
+constexpr int kMaxMissed = 1'000;
+constexpr int kMarksPage = 20;  // of up to 8 KiB of text each
+constexpr int kReportsPage = 1'000;
+
+// Where a client stands: the last mark that it was told of, 0 for none, and when.
+struct Place {
+    int mark = 0;
+    std::int64_t told_s = 0;
+
+    std::string Text() const { return std::to_string(mark) + '-' + std::to_string(told_s); }
+};
+
+std::optional<Place> PlaceOf(const Call& call) {
+    const Json::Value& after = call.Parameter("after");
+    const std::string text = after.isNull() ? std::string(call.request.Header("HTTP_LAST_EVENT_ID")) : after.asString();
+    if (text.empty()) {
+        return std::nullopt;
+    }
+    Place place;
+    const char* const end = text.data() + text.size();
+    const auto mark = std::from_chars(text.data(), end, place.mark);
+    const bool has_time = mark.ec == std::errc() && mark.ptr != end && *mark.ptr == '-';
+    const auto time = has_time ? std::from_chars(mark.ptr + 1, end, place.told_s) : mark;
+    if (!has_time || place.mark < 0 || time.ec != std::errc() || time.ptr != end) {
+        throw Failure(400, "after is no id of an event of this stream");
+    }
+    return place;
+}
+
+// What there is behind a mark.
+struct Backlog {
+    int last = 0;    // the newest mark, whoever may see it
+    int missed = 0;  // how many the caller may see, …
+    int newest = 0;  // … of these the last …
+    int oldest = 0;  // … and the first
+};
+
+// Goes back from the newest mark until more than max are found, or what was reported before since_s.
+Backlog LookBack(store::Marks& marks, int after, int max, std::int64_t since_s) {
+    Backlog found{.last = after};
+    for (int before = std::numeric_limits<int>::max();;) {
+        const std::vector<store::Marks::Report> reports = marks.ReportsBetween(after, before, kReportsPage);
+        for (const store::Marks::Report& report : reports) {
+            found.last = std::max(found.last, report.id);
+            if (report.reported_s < since_s || found.missed > max) {
+                return found;
+            }
+            if (IsVisible(report)) {
+                found.newest = std::max(found.newest, report.id);
+                found.oldest = report.id;
+                ++found.missed;
+            }
+        }
+        if (reports.size() < kReportsPage) {
+            return found;
+        }
+        before = reports.back().id;
+    }
+}
+
+std::string EventText(const char* name, const Place& place, const Json::Value& data) {
+    return std::string("event: ") + name + "\nid: " + place.Text() + "\ndata: " + base::OneLineJson(data) + "\n\n";
+}
+
+bool Send(const Call& call, std::string text) {
+    iovec piece{text.data(), text.size()};
+    return call.context.output()->Send({&piece, 1});
+}
+
+// The first event, and the mark behind which those follow that are to be told.
+struct Start {
+    std::string event;
+    int cursor = 0;
+};
+
+Start StartOf(const Call& call) {
+    const std::int64_t now_s = base::WallSeconds();
+    const std::int64_t since_s = now_s - kMaxAwaySeconds;
+    store::Marks marks(call.Records());
+    const std::optional<Place> asked = PlaceOf(call);
+    Backlog backlog;
+    // A store that was restored from a backup gives the ids of lost marks once more.
+    bool is_resumed = asked && asked->told_s > since_s && asked->told_s <= now_s + 60 && asked->mark <= marks.LastId();
+    if (is_resumed) {
+        backlog = LookBack(marks, asked->mark, kMaxMissed, since_s);
+        is_resumed = backlog.missed <= kMaxMissed;
+    }
+    if (!is_resumed) {
+        backlog = LookBack(marks, 0, 0, since_s);
+        backlog.missed = 0;
+    }
+    Json::Value data;
+    data["resumed"] = is_resumed;
+    data["missed"] = backlog.missed;
+    data["time"] = Json::Int64{now_s};
+    const Place place{is_resumed ? asked->mark : backlog.newest, now_s};
+    return {EventText("start", place, data), backlog.missed > 0 ? backlog.oldest - 1 : backlog.last};
+}
+
+// Tells what was reported behind that mark; returns the last one.
+int TellReported(const Call& call, int cursor) {
+    for (bool is_all = false; !is_all && !call.slot.MustEnd();) {
+        std::string text;
+        const std::vector<store::Mark> reported = store::Marks(call.Records()).ReportedAfter(cursor, kMarksPage);
+        for (const store::Mark& mark : reported) {
+            cursor = mark.id;
+            if (IsVisible(mark)) {
+                text += EventText("mark", {mark.id, base::WallSeconds()}, Describe(mark));
+            }
+        }
+        is_all = reported.size() < kMarksPage;
+        call.context.CloseRecords();
+        if (!text.empty() && !Send(call, std::move(text))) {
+            return cursor;
+        }
+    }
+    return cursor;
+}
+
+}  // namespace
+
+std::string Watch(const Call& call) {
+    const std::atomic<std::uint32_t>& reports = call.slots.Reports();
+    std::uint32_t seen = reports;
+    auto [event, cursor] = StartOf(call);
+    if (!call.slots.BeginWatch(call.slot, kMaxWatchesOfUser)) {
+        throw Failure(503, "this account watches for events in too many places", http::kRetrySoonSeconds);
+    }
+    call.context.NoteStream();
+    call.context.CloseRecords();
+    Send(call, "Status: 200 OK\r\nContent-Type: text/event-stream\r\nCache-Control: no-store\r\n\r\n" + event);
+    while (!call.context.output()->IsBroken() && !call.slot.MustEnd()) {
+        cursor = TellReported(call, cursor);
+        base::SleepWhile(reports, seen, kHeartbeat);
+        if (reports == seen) {
+            Send(call, ":\n\n");
+        }
+        seen = reports;
+    }
+    return "";
+}
+
+}  // namespace lookhaven::api
