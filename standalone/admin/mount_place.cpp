@@ -89,7 +89,7 @@ void RequireSafePath(const base::Installation& installation, const std::string& 
         base::FileDescriptor next(::openat(folder.Get(), name.c_str(), kStepFlags));
         if (!next) {
             Refuse(path, errno == ENOENT ? "it does not exist; create it, or mount its disk, first"
-                                         : "it is no folder, or there is a symbolic link in its path");
+                                         : "it is not a folder, or there is a symbolic link in its path");
         }
         folder = std::move(next);
         if (IsSame(StatusOf(folder, path), home)) {

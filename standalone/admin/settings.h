@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What holds for the whole installation: each setting with its default, its meaning and its bounds.
+// The settings of the whole installation: each with its default, its meaning and its bounds.
 //
 // Failures      Besides what its declaration names, each throws Forbidden and store::StoreError; nothing was changed
 //               then.

@@ -60,7 +60,7 @@ void RequireObject(const Json::Value& json, const std::string& name) {
 
 void RequireEmpty(const Json::Value& json, const std::string& name) {
     if (!json.empty()) {
-        throw store::InvalidRecord("nothing is called " + json.getMemberNames().front() + " in " + name);
+        throw store::InvalidRecord(name + " has no member " + json.getMemberNames().front());
     }
 }
 

@@ -161,7 +161,7 @@ void RemoveUser(store::Store& store, const Actor& actor, int id, std::optional<s
         RequireCurrent(before, seen);
         RequireAnotherOwner(users, user);
         if (id == actor.user_id) {
-            throw StillNeeded("nobody removes the own account: another manager must");
+            throw StillNeeded("you cannot remove your own account; ask another manager");
         }
         users.Remove(id);
         return Change{"user.remove", Named(user.name, id), before, {}};

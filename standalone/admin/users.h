@@ -3,7 +3,7 @@
 // Changes of accounts.
 //
 // Invariants    (1) Once there is an owner, there always is one. (2) Only an owner or the command line makes, changes
-//               or removes an owner. (3) Nobody removes the own account.
+//               or removes an owner. (3) Nobody removes their own account.
 //               (4) A change that takes a right away ends the account's sessions, as store/users.h says.
 // Failures      Besides what its declaration names, each throws Forbidden, Stale, store::NotFound, store::InvalidRecord
 //               and store::StoreError; nothing was changed then.

@@ -50,7 +50,7 @@ std::string LogIn(const Call& call) {
         LogRefused(call.context.Installation(), account, address, failure.what());
         throw;
     } catch (const store::NotFound&) {  // removed, or its password changed, in this moment
-        LogRefused(call.context.Installation(), account, address, "the account has changed in this moment");
+        LogRefused(call.context.Installation(), account, address, "the account was changed meanwhile");
         throw Failure(401, "wrong account or password");
     }
 }

@@ -40,7 +40,7 @@ std::string Groups(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// A viewer is not shown a mount without a camera that he may see.
+// A viewer is not shown a mount without a camera that they may see.
 std::string Mounts(const Call& call) {
     const bool is_manager = binding::IsManager();
     Json::Value data;

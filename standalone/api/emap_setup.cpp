@@ -66,7 +66,7 @@ emap::MapPicture DrawnPicture(const Call& call) {
         throw Failure(400, "the body must be the picture's file, and its Content-Type no form's");
     }
     if (!call.slots.BeginProbing(call.slot, kMaxAtOnce)) {
-        throw Failure(429, "three pictures or cameras are being looked at already; try again in a moment",
+        throw Failure(429, "three pictures or cameras are being processed already; try again in a moment",
                       http::kRetrySoonSeconds);
     }
     call.context.CloseRecords();

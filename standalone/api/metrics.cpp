@@ -223,7 +223,7 @@ void AddViewers(MetricsText& text, const control::SlotTable& slots) {
         text.Sample(static_cast<double>(kind.private_kib) * 1024,
                     {{"api", SplitCall(call).first}, {"method", SplitCall(call).second}});
     }
-    text.Family("lookhaven_running_requests", "gauge", "Requests that run and are no streams, this one too.");
+    text.Family("lookhaven_running_requests", "gauge", "Running requests other than streams, including this one.");
     text.Sample(others);
 }
 

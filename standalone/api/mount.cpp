@@ -76,7 +76,7 @@ Condition Inspect(store::Store& records, const store::Mount& mount) {
     }
     const maintenance::MountSpace space = maintenance::OpenMount(records, mount).value().Space();
     if (::access(mount.path.c_str(), R_OK | W_OK | X_OK) != 0) {
-        return errno == EROFS ? Condition{"read-only", "its disk takes no changes", space}
+        return errno == EROFS ? Condition{"read-only", "its file system is mounted read-only", space}
                               : Condition{"no-access", "the server has no write access to the folder", space};
     }
     if (space.free_bytes < space.ReserveBytes() || space.free_files < space.ReserveFiles()) {
@@ -100,7 +100,7 @@ Condition ConditionOf(store::Store& records, const store::Mount& mount, const Su
         if (status.mount == mount.id && condition.state == "ready" && tells_more) {
             condition.state = maintenance::NameOf(status.state);
             condition.message = status.state == MountState::kInUse       ? "another recorder works on it"
-                                : status.state == MountState::kSpaceHeld ? "what was deleted does not become free"
+                                : status.state == MountState::kSpaceHeld ? "deleting frees no space"
                                 : status.state == MountState::kKeptFull
                                     ? "kept recordings alone reach its limit: everything else is deleted at once"
                                     : status.reason;

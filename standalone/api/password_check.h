@@ -28,7 +28,7 @@ class HashingPermit {
 // attempt for which there is no room does not count as one, and one that is barred takes no room.
 store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password);
 
-// The caller, who gives his password once more in the parameter of that name. A wrong one counts and is logged as that
+// The caller, who gives their password again in the parameter of that name. A wrong one counts and is logged as that
 // of a log-in. Throws Failure 403 for a wrong one, so that a client does not take its session for ended; 429 and 503.
 store::VerifiedUser Reauthenticate(const Call& call, const std::string& parameter);
 

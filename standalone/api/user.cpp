@@ -198,7 +198,7 @@ std::string ChangePassword(const Call& call) {
         admin::ChangePassword(call.Records(), call.Actor().address, user, Hash(call, password),
                               call.login.value().session_handle);
     } catch (const store::NotFound&) {
-        throw Failure(409, "the account has changed in this moment");
+        throw Failure(409, "the account was changed meanwhile");
     }
     return SuccessAnswer(Json::objectValue);
 }

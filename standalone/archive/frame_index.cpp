@@ -198,7 +198,7 @@ FrameIndexReader::FrameIndexReader(base::FileDescriptor file, std::string path)
         throw ArchiveError(path_ + (size == 0 ? " is empty" : " is cut short"));
     }
     if (raw.magic != kMagic) {
-        throw ArchiveError(path_ + " is no frame index");
+        throw ArchiveError(path_ + " is not a frame index");
     }
     if (raw.version != kVersion) {
         throw ArchiveError(path_ + " is a frame index of another version");

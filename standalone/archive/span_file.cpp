@@ -42,7 +42,7 @@ Span Parse(std::string_view text, const std::string& path) {
     Span span;
     if (TakeLine(text, kFirstLine) != std::string_view() || !TakeTime(text, "begin ", span.begin_ms) ||
         !TakeTime(text, "end ", span.end_ms)) {
-        throw ArchiveError(path + " is no span of recordings");
+        throw ArchiveError(path + " is not a span of recordings");
     }
     if (span.begin_ms < 0 || span.end_ms < span.begin_ms ||
         span.end_ms - span.begin_ms > std::int64_t{base::kMaxRecordingSeconds} * 1000) {
@@ -51,7 +51,7 @@ Span Parse(std::string_view text, const std::string& path) {
     while (!text.empty()) {
         const auto recording = TakeLine(text, "recording ");
         if (!recording || !IsRecording(*recording) || span.recordings.size() == kMaxSpanRecordings) {
-            throw ArchiveError(path + " names what is no recording");
+            throw ArchiveError(path + " names something that is not a recording");
         }
         span.recordings.emplace_back(*recording);
     }

@@ -174,7 +174,7 @@ Summary Unpack(int descriptor, const WorkFolder& folder) {
     while (const std::optional<std::string> name = tar.Next()) {
         const std::optional<std::uintmax_t> max_bytes = MaxBytesOf(*name, folder / "");
         if (!max_bytes || files.contains(*name) || files.size() == kMaxFiles || is_whole) {
-            throw Malformed("this is no backup, or a damaged one: it holds a file that belongs to none");
+            throw Malformed("this is not a backup, or a damaged one: it holds a file that belongs to none");
         }
         const FileDigest digest = tar.CopyTo(folder / *name, *max_bytes);
         is_whole = *name == kManifest;

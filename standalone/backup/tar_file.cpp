@@ -69,7 +69,7 @@ FileDigest TarWriter::AddFile(const std::string& name, const std::filesystem::pa
     const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
     struct stat about {};
     if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode)) {
-        throw std::system_error(EINVAL, std::generic_category(), path.string() + " is no regular file");
+        throw std::system_error(EINVAL, std::generic_category(), path.string() + " is not a regular file");
     }
     BeginEntry(name, about.st_size);
     base::Sha256 hash;
@@ -106,7 +106,7 @@ TarReader::TarReader(int descriptor) : archive_(::archive_read_new(), ::archive_
     if (::archive_read_support_filter_zstd(archive_.get()) != ARCHIVE_OK ||
         ::archive_read_support_format_tar(archive_.get()) != ARCHIVE_OK ||
         ::archive_read_open_fd(archive_.get(), descriptor, kBlockBytes) != ARCHIVE_OK) {
-        throw Malformed("this is no backup: " + ReasonOf(archive_.get()));
+        throw Malformed("this is not a backup: " + ReasonOf(archive_.get()));
     }
 }
 

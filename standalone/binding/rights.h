@@ -27,7 +27,7 @@ LH_PLATFORM_API bool MayUse(int camera, store::CameraAccess kind);
 // False for an item that is denied to the caller, and for nobody as the caller. Throws store::StoreError.
 LH_PLATFORM_API bool MaySee(store::DeniableItem kind, int id);
 
-// Whether the caller is a manager of the host, and the request leaves him that. Throws store::StoreError.
+// Whether the caller is a manager of the host, and the request leaves them that. Throws store::StoreError.
 LH_PLATFORM_API bool IsManager();
 
 // The cameras at which MayUse is false for a caller who is somebody. Throws store::StoreError.

@@ -269,7 +269,7 @@ void AddCamera(CLI::App& program, const Console& console) {
     group.Add("list", "Lists the cameras", List);
     group.Add("remove", "Removes a camera", Remove)
         .Option("id", request.id, id, Required)
-        .Flag("--delete-footage", request.deletes_footage, "Deletes its recordings, too, but for kept ones");
+        .Flag("--delete-footage", request.deletes_footage, "Also deletes its recordings, except kept ones");
     group.Add("plan", "Shows or sets in which hours of the week a camera is recorded", Plan)
         .Option("id", request.id, id, Required)
         .Option("hours", request.hours, "Such as \"mon-fri 8-18 always\" \"sat-sun alarm\"; later ones win");

@@ -52,7 +52,7 @@ void CameraOptions::AddTo(Command& command) {
         .Switch("--ptz,!--no-ptz", ptz_, "Whether it can pan, tilt and zoom")
         .Switch("--audio,!--no-audio", audio_, "Whether it sends audio")
         .Switch("--insecure,!--secure", insecure_,
-                "Whether its HTTPS certificate may be any (initially one that this machine trusts)");
+                "Whether to accept any HTTPS certificate (initially only one that this machine trusts)");
     for (const auto& [name, number] : store::ProfileNames()) {
         ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";

@@ -72,12 +72,12 @@ base::Installation Console::Installation() const {
     BecomeOwner();
     const std::string home = HomePath();
     if (::access(home.c_str(), F_OK) != 0) {
-        throw Failure(kNoInput, "there is no state folder at ", home,
+        throw Failure(kNoInput, "there is not a state folder at ", home,
                       ": create it with lookhaven init, or name another with --home");
     }
     if (::access(home.c_str(), R_OK | X_OK) == 0 && !base::IsStateFolder(home)) {
         throw Failure(kNoInput, "the folder ", home,
-                      " is no state folder: make one with lookhaven init, or name another with --home");
+                      " is not a state folder: make one with lookhaven init, or name another with --home");
     }
     return base::Installation(home);
 }

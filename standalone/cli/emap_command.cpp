@@ -125,7 +125,7 @@ Json::Value ReadEmapFile(const std::string& path) {
     const Json::Value file = ParseJson(ReadBounded(path, 2 * emap::kMaxPictureBytes));
     if (!file.isObject() || file["lookhaven_emap"] != kFileVersion || !file["name"].isString() ||
         !file["picture"].isString() || !file["hideItemName"].isBool() || !file["smallItemSize"].isBool()) {
-        throw Failure(kDataError, path, " is no e-map that lookhaven emap export wrote");
+        throw Failure(kDataError, path, " is not an e-map that lookhaven emap export wrote");
     }
     return file;
 }

@@ -273,8 +273,8 @@ void AddEvent(CLI::App& program, const Console& console) {
     group.Add("keep", "Keeps an event's footage beyond its mount's limits", Keep)
         .Option("id", request.id, id, Required)
         .Option("--note", request.note, "Why it is kept");
-    group.Add("release", "No longer keeps it beyond them", Release).Option("id", request.id, id, Required);
-    group.Add("mark", "Reports an alert or POS transaction, whose footage is kept together", AddMark)
+    group.Add("release", "Releases a kept event", Release).Option("id", request.id, id, Required);
+    group.Add("mark", "Reports an alert or POS transaction with its footage", AddMark)
         .Option("camera", request.camera, "The camera's id", Required)
         .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(store::MarkKindNames()))
         .Option("--at", request.at, "When it happened (default: now)")

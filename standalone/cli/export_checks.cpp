@@ -41,7 +41,7 @@ const char* NameOf(Signer signer) {
 std::string SentenceOf(Signer signer, const std::string& fingerprint) {
     switch (signer) {
     case Signer::kNobody:
-        return "Nobody signed it: whoever changes a file can change its hash along.";
+        return "Nobody signed it: whoever changes a file can change its hash as well.";
     case Signer::kUnknown:
         return "Signed by a key that this host does not know, " + fingerprint +
                ": anybody can make one. Compare it with what lookhaven export key shows on the host that the export is"

@@ -38,7 +38,7 @@ struct Request {
 int CameraId(const std::string& text) {
     const std::optional<int> id = ParseNumber<int>(text);
     if (!id) {
-        throw Failure(kUsage, text, " is no camera's number: see lookhaven export --help");
+        throw Failure(kUsage, text, " is not a camera's id: see lookhaven export --help");
     }
     return *id;
 }

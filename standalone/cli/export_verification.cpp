@@ -66,7 +66,8 @@ class Zip {
     // A warning, as of a name that the locale cannot show, is none of ours.
     void Require(int result) const {
         if (result < ARCHIVE_WARN) {
-            throw Failure(kDataError, file_, " is no export, or is cut: ", archive_error_string(archive_.get()));
+            throw Failure(kDataError, file_,
+                          " is not an export, or is cut off: ", archive_error_string(archive_.get()));
         }
     }
 
@@ -161,7 +162,7 @@ ExportVerification VerifyExport(const std::string& file) {
     Members members = Zip(file).ReadAll();
     const auto manifest = members.extract(evidence::kManifestName);
     if (manifest.empty()) {
-        throw Failure(kDataError, file, " has no ", evidence::kManifestName, ", so it is no export");
+        throw Failure(kDataError, file, " has no ", evidence::kManifestName, ", so it is not an export");
     }
     ExportVerification verification;
     CheckSignature(members, manifest.mapped().text, verification);

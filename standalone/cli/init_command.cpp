@@ -37,7 +37,7 @@ void RequireOwnFolder(const std::string& home) {
     std::error_code error;
     if (!base::IsStateFolder(home) && std::filesystem::exists(home, error) && !HoldsEmptyFoldersOnly(home) && !error) {
         throw Failure(kCannotCreate, "the folder ", home,
-                      " is not empty and is no state folder: choose another with --home");
+                      " is not empty and is not a state folder: choose another with --home");
     }
 }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven setting: what holds for the whole installation.
+// lookhaven setting: settings of the whole installation.
 #include <string>
 
 #include "standalone/admin/settings.h"
@@ -77,7 +77,7 @@ void Check(const Console& console, const CheckRequest& request) {
 }  // namespace
 
 void AddSetting(CLI::App& program, const Console& console) {
-    CommandGroup<> group(program, console, "setting", "What holds for the whole installation");
+    CommandGroup<> group(program, console, "setting", "Settings of the whole installation");
     group.Add("show", "Shows all settings", Show);
     CommandGroup<CheckRequest> check(group.app(), console);
     check.Add("check", "Checks the settings of the installed services", Check)

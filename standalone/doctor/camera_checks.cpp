@@ -117,7 +117,7 @@ Findings CheckRecordings(const base::Installation& installation) {
             const bool lacks_event_id = status.state == RecordingState::kNoEventId;
             findings.push_back({Concat(TitleOf(status), " is not recorded: ", maintenance::NameOf(status.state)),
                                 lacks_event_id
-                                    ? "repair the store, which gives out event ids; recording then resumes by itself"
+                                    ? "repair the store, which assigns event ids; recording then resumes by itself"
                                     : "check that its mount is enabled and in its place with lookhaven mount "
                                       "list; recording then resumes by itself"});
         }

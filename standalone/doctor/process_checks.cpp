@@ -28,9 +28,8 @@ Findings CheckRecorder(const base::Installation& installation) {
         return {};
     }
     if (state == control::RecorderState::kHangs) {
-        return {
-            {"the recorder hangs: nothing is recorded or shown live, and what it last told of the cameras is stale",
-             "let it go on if somebody stopped it (pkill -CONT -f lookhaven-recorder), or else restart the server"}};
+        return {{"the recorder hangs: nothing is recorded or shown live, and what it last told of the cameras is stale",
+                 "resume it if it was stopped (pkill -CONT -f lookhaven-recorder), or else restart the server"}};
     }
     return {{control::MapCommonConfig(installation) == nullptr ? "the recorder has not run since the machine started"
                                                                : "the recorder does not run",

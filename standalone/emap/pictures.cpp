@@ -135,13 +135,13 @@ void Pictures::Sweep() {
 
 std::string Pictures::Read(const std::string& name) const {
     if (!IsPictureName(name)) {
-        throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is no picture of an e-map");
+        throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is not a picture of an e-map");
     }
     const fs::path path = folder_ / name;
     const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
     struct stat about {};
     if (::fstat(file.Get(), &about) != 0 || !S_ISREG(about.st_mode) || about.st_size > off_t{kMaxPictureBytes}) {
-        throw std::system_error(EFBIG, std::generic_category(), path.string() + " is no picture file");
+        throw std::system_error(EFBIG, std::generic_category(), path.string() + " is not a picture file");
     }
     std::string bytes(static_cast<std::size_t>(about.st_size), '\0');
     const std::optional<std::size_t> read = base::ReadAllAt(file.Get(), bytes.data(), bytes.size(), 0);

@@ -35,7 +35,7 @@ Key ReadPrivateKey(const std::filesystem::path& file) {
     const Bio bio(BIO_new_fd(opened.Get(), BIO_NOCLOSE), BIO_free_all);
     Key key(bio ? PEM_read_bio_PrivateKey(bio.get(), nullptr, NoPassword, nullptr) : nullptr, EVP_PKEY_free);
     if (!IsEd25519(key)) {
-        throw std::runtime_error(file.string() + " is no Ed25519 key in PEM format");
+        throw std::runtime_error(file.string() + " is not an Ed25519 key in PEM format");
     }
     return key;
 }

@@ -21,7 +21,7 @@ class FileLoop : public Source {
           deadline_(std::move(stop), options.no_data_limit) {
         // A pipe or a device could block forever, and would not play twice.
         if (!std::filesystem::is_regular_file(path_)) {
-            throw SourceError("is no regular file");
+            throw SourceError("is not a regular file");
         }
         Open();
     }

@@ -10,7 +10,7 @@ std::unique_ptr<Source> OpenSource(const SourceKinds& kinds, const std::string& 
                                    std::stop_token stop) {
     const SourceOpener open = FindKind(kinds, url);
     if (open == nullptr) {
-        throw SourceError("is no source that is known: it begins with " + ListKinds(kinds));
+        throw SourceError("has an unknown kind of source; addresses begin with " + ListKinds(kinds));
     }
     PrepareAv();
     const base::BlockedSignals blocked;  // for the threads that libav may start

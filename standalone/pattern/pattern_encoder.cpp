@@ -119,7 +119,7 @@ std::unique_ptr<PatternEncoder> MakePatternEncoder(const std::string& codec, con
     if (codec == "h264") {
         return std::make_unique<H264Encoder>(settings);
     }
-    throw media::SourceError("is no test pattern that is known (test:mjpeg, test:h264)");
+    throw media::SourceError("has an unknown test pattern (known are test:mjpeg and test:h264)");
 }
 
 }  // namespace lookhaven::pattern

@@ -37,7 +37,7 @@ void RequireMark(const Mark& mark) {
     }
     if (mark.start_s < 0 || mark.end_s < mark.start_s || mark.end_s - mark.start_s > kMaxFootageSeconds ||
         mark.end_s > kLastMoment) {
-        throw InvalidRecord("a mark is of a moment since 1970 and lasts 0 to 3600 seconds");
+        throw InvalidRecord("a mark's time must be after 1970 and its length 0 to 3600 seconds");
     }
     if (!IsMarkText(mark.text)) {
         throw InvalidRecord("a mark's text is lines of UTF-8 without control characters, 8192 bytes at most");
@@ -78,7 +78,7 @@ const char* NameOf(MarkState state) {
 Mark Marks::Add(MarkKind kind, int camera_id, std::int64_t moment_s, std::int64_t length_s, const std::string& text,
                 const Reporter& reporter, std::int64_t now_s, std::int64_t max_per_day) {
     if (moment_s < 0 || moment_s > kLastMoment || length_s < 0 || length_s > kMaxMarkSeconds) {
-        throw InvalidRecord("a mark is of a moment since 1970 and lasts 0 to 3600 seconds");
+        throw InvalidRecord("a mark's time must be after 1970 and its length 0 to 3600 seconds");
     }
     return connection_.Write([&](soci::session& sql) {
         RequireCameraRow(sql, camera_id);

@@ -61,7 +61,7 @@ void Describe(CLI::App& app, Options& options) {
     app.add_option("--spare-processes", options.limits.spare_processes, "processes that wait for a request each")
         ->check(CLI::Range(0, 64));
     AddMillis(app, "--read-seconds", options.limits.read, "for a request to arrive");
-    AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is no stream");
+    AddMillis(app, "--answer-seconds", options.limits.processes.answer, "for a request that is not a stream");
     AddMillis(app, "--leave-seconds", options.limits.processes.leave, "for a process that was told to end");
 }
 

@@ -20,12 +20,12 @@ await visit(async (page, complaints) => {
   await page.getByLabel("Account").fill("ada");
   await page.getByLabel("Password (").fill("correct horse");
   await page.getByLabel("Repeat").fill("correct horse");
-  await button("Make the account");
+  await button("Create the account");
   await page.getByRole("alert").filter({ hasText: "replaced by a newer one" }).waitFor();
   await look("replaced");
 
   await page.evaluate((token) => void (location.hash = `#setup=${token}`), process.env.TOKEN);
-  await button("Make the account");
+  await button("Create the account");
   await page.locator(".setup-steps [aria-current=step]", { hasText: "First camera" }).waitFor();
   await page.getByLabel("Address", { exact: true }).fill(process.env.CAMERA);
   await look("account");

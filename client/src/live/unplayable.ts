@@ -24,7 +24,7 @@ export function missingDecoder(): Unplayable | null {
   if (typeof VideoDecoder !== "undefined") return null;
   if (isSecureContext) return { reason: "This browser is too old to play live video", retryMs: Infinity };
   const remedy = { label: "Use https", address: secureAddress() };
-  return { reason: "Live video needs https", retryMs: Infinity, remedy };
+  return { reason: "Live video needs HTTPS", retryMs: Infinity, remedy };
 }
 
 export const kUndecodable: Unplayable = { reason: "The stream cannot be decoded", retryMs: 60_000 };

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Accounts, their rights and sessions. All but the change of the own password is for managers only.
+// Accounts, their rights and sessions. All but the change of one's own password is for managers only.
 
 import type { Named } from "./camera_setup";
 import type { Server } from "./server";

@@ -102,7 +102,7 @@ TEST_P(MountTest, AnAccountMayAddOnlyWhatNobodyElseUsesOrCouldExchange) {
         {disks + "/none", "does not exist"},
         {disks + "/link", "symbolic link"},
         {(folder_ / "way").string() + "/empty", "symbolic link"},
-        {disks + "/full/index.html", "no folder"},
+        {disks + "/full/index.html", "not a folder"},
         {disks + "/full", "not empty"},
         {disks + "/first", "not empty"},  // with another mount's marker
         {disks + "/home", "state folder"},

@@ -73,7 +73,7 @@ TEST_P(SettingsTest, TakeWhatTheirBoundsAllowFromThoseWhoMay) {
         {"mount_folders", "/mnt/", operator_on_the_host, "each begins with / and ends without"},
         {"mount_folders", 5, operator_on_the_host, "each begins with /"},
         {"monitor_token", "mine", manager_, "forbidden"},
-        {"monitor_token", "mine", operator_on_the_host, "made anew"},
+        {"monitor_token", "mine", operator_on_the_host, "can only be replaced"},
         {"installation", "mine", operator_on_the_host, "not found"},
     };
     for (const auto& row : rows) {

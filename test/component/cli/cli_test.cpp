@@ -29,8 +29,8 @@ TEST_F(CliTest, WithoutAnInstallationEveryCommandSaysHowToMakeOneAndWrongUsePoin
     }
     Play({{"--json camera list", 66, "\"code\" : 66"}});
     std::filesystem::create_directory(home_);
-    Play({{"camera list", 66, "is no state folder"},
-          {"init --home " + folder_.Path().string(), 73, "not empty and is no state folder"},
+    Play({{"camera list", 66, "is not a state folder"},
+          {"init --home " + folder_.Path().string(), 73, "not empty and is not a state folder"},
           {"init --home /proc/none", 73, "--home"},
           {"version", 0, "lookhaven "},
           {"version --json", 0, "\"version\""},
@@ -268,7 +268,7 @@ TEST_F(CliTest, AnInstallationMayKeepItsStoreInPostgresql) {
           {"backup " + backup, 73, "already a file"},
           {"restore " + backup, 65, "accounts"},
           {"restore " + backup + "-absent", 66, "absent"},
-          {"restore /dev/null", 65, "no backup"},
+          {"restore /dev/null", 65, "not a backup"},
           {"store move sqlite:moved.db", 65, "absolute"}});
     EXPECT_FALSE(std::filesystem::exists(home_ / "lookhaven.db"));
     {

@@ -90,8 +90,8 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     } rows[] = {
         {"test:nonsense", "no test pattern"},
         {"test:mjpeg?size=1x1", "has a size"},
-        {"file:" + (home_ / "missing.mkv").string(), "no regular file"},
-        {"file:/dev/zero", "no regular file"},
+        {"file:" + (home_ / "missing.mkv").string(), "not a regular file"},
+        {"file:/dev/zero", "not a regular file"},
         {"file:" + (home_ / "log/recorder").string(), "cannot open"},
         {"http://127.0.0.1:1/", "Connection refused", kRefused},
         {"rtsp://127.0.0.1:1/", "Connection refused", kRefused},

@@ -33,7 +33,7 @@ export function whyNoEvents(filter: EventFilter, hidden: number, calendar: Calen
   if (calendar.isLoading) return "";
   if (calendar.hasRecordings) return "No events in this time span. The calendar marks the days with recordings.";
   return (
-    "Nothing was recorded of these cameras in the month of the calendar. Look at another month or other cameras; " +
+    "Nothing was recorded of these cameras in the month of the calendar. Choose another month or other cameras; " +
     "a manager can switch recording on under Settings › Cameras."
   );
 }

@@ -9,13 +9,13 @@ import { kJumpMs, type TransportActions } from "./transport";
 
 export const kEventsKeys: KeyList = [
   ["Space", "Play or pause"],
-  ["Left Right", "One frame back or on; with Shift ten"],
-  ["J L", "Ten seconds back or on"],
+  ["Left Right", "One frame back or forward; with Shift ten"],
+  ["J L", "Ten seconds back or forward"],
   ["Up Down", "The event before or after"],
   ["[ ]", "Slower or faster"],
   ["T", "Go to a time"],
   ["A", "Same moment on all cameras"],
-  ["Enter", "The picture that leads large, or all again"],
+  ["Enter", "Enlarge the active picture, or show all"],
   ["1 2 3", "One camera, two by two, three by three"],
   ["N", "Live"],
   ["Left Right", "On the timeline: move the playhead; it plays from where it is let go"],

@@ -22,7 +22,7 @@ export function setupScreen(server: Server, token: () => string | null, outcome:
   const name = credentialField("account", "Account", plain);
   const password = credentialField("password", "Password (at least eight characters)", secret);
   const again = credentialField("password-again", "Repeat password", secret);
-  const submit = element("button", { type: "submit", class: "button primary" }, "Make the account");
+  const submit = element("button", { type: "submit", class: "button primary" }, "Create the account");
   const message = element("p", { class: "login-message", role: "alert" });
   const form = element(
     "form",

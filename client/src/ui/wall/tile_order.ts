@@ -8,7 +8,7 @@ const kStorageKey = "lookhaven.order";
 /** A pointer that moved less than this has clicked. */
 const kDragPx = 8;
 
-/** In the user's order; cameras that he never moved come after the others, as the server lists them. */
+/** In the user's order; cameras that they never moved come after the others, as the server lists them. */
 export function inOwnOrder(cameras: readonly Camera[]): Camera[] {
   const order = storedOrder();
   const place = ({ id }: Camera) => (order.includes(id) ? order.indexOf(id) : order.length);

@@ -15,7 +15,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   });
 
   const open = (hash: string) => client.open(client.address + hash, 390, 844);
-  const make = (page: Page) => page.getByRole("button", { name: "Make the account" }).click();
+  const make = (page: Page) => page.getByRole("button", { name: "Create the account" }).click();
   const says = (page: Page, words: string) => page.getByRole("alert").filter({ hasText: words }).waitFor();
   const typed = (page: Page) => page.locator("input").evaluateAll((fields) => fields.map((field) => (field as HTMLInputElement).value));
 

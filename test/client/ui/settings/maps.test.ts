@@ -31,5 +31,5 @@ test("a file that no server would take is not sent, any other as it is", async (
 test("before a map is removed, the user is told what goes and what else shows it", () => {
   const linked = removalSentences({ items: 1, linkedFrom: [{ id: 2, name: "Upper floor" }, { id: 3, name: "Site" }] });
   expect(linked.join(" ")).toMatch(/places of 1 item on it.*link on: Upper floor, Site\./);
-  expect(removalSentences({ items: 0, linkedFrom: [] })).toEqual(["Its picture goes.", "No other map has a link to it."]);
+  expect(removalSentences({ items: 0, linkedFrom: [] })).toEqual(["Its picture is deleted.", "No other map has a link to it."]);
 });

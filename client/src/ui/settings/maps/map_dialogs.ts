@@ -65,9 +65,11 @@ export function removalSentences({ items, linkedFrom }: Pick<EmapRecord, "items"
   const links = linkedFrom.map(({ name }) => name).join(", ");
   return [
     items > 0
-      ? `Its picture goes, and so do the places of ${counted(items, "item")} on it. Cameras and devices stay.`
-      : "Its picture goes.",
-    links ? `It is also shown as a link on: ${links}. That link will lead nowhere.` : "No other map has a link to it.",
+      ? `Its picture is deleted, and so are the places of ${counted(items, "item")} on it. Cameras and devices stay.`
+      : "Its picture is deleted.",
+    links
+      ? `It is also shown as a link on: ${links}. That link stays and will no longer work.`
+      : "No other map has a link to it.",
   ];
 }
 
