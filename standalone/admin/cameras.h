@@ -54,7 +54,7 @@ CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::Sour
 
 enum class Footage { kKeep, kRemove };
 // kRemove: once the camera is gone, its recordings are taken out of every search, in many small transactions, and the
-// recorder deletes the files by and by. Kept ones stay. Waits up to five seconds for the recorder to finish what it is
+// recorder deletes the files over time. Kept ones stay. Waits up to five seconds for the recorder to finish what it is
 // writing. What is unfinished then, or left when this is interrupted or throws, the recorder's maintenance removes.
 void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen, Footage footage);
 

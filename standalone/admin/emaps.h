@@ -45,7 +45,7 @@ store::Emap SetEmap(store::Store& store, const Actor& actor, const std::filesyst
 // Conflict it throws too.
 int PlaceItems(store::Store& store, const Actor& actor, const store::Emap& emap,
                const std::vector<store::EmapItem>& items);
-// With its items and its picture. Links to it stay on other maps until these are changed, and lead nowhere.
+// With its items and its picture. Links to it stay on other maps until these are changed, and no longer work.
 void RemoveEmap(store::Store& store, const Actor& actor, const std::filesystem::path& home, int id,
                 std::optional<std::int64_t> seen);
 

@@ -15,7 +15,7 @@ struct MountFigures {
     bool is_there = true;            // whether the two are known
     std::int64_t max_bytes = 0;      // the mount's limits; 0: none
     std::int64_t max_age_s = 0;
-    double bytes_per_day = 0;  // recorded of late
+    double bytes_per_day = 0;  // recorded recently
 };
 
 // After so many days footage is deleted: the least of what the limits and the disk allow. Nothing when nothing is

@@ -63,8 +63,8 @@ bool IsSame(const struct stat& one, const struct stat& other) {
 // Whether root or the server's own user has it, and nobody else can write to it.
 bool IsOwn(const struct stat& status) {
     const bool is_own_group = status.st_gid == 0 || status.st_gid == ::getegid();
-    const mode_t strangers = S_IWOTH | (is_own_group ? 0U : S_IWGRP);
-    return (status.st_uid == 0 || status.st_uid == ::geteuid()) && (status.st_mode & strangers) == 0;
+    const mode_t others_write = S_IWOTH | (is_own_group ? 0U : S_IWGRP);
+    return (status.st_uid == 0 || status.st_uid == ::geteuid()) && (status.st_mode & others_write) == 0;
 }
 
 // Nobody else can put something in the place of what is in it.

@@ -39,16 +39,16 @@ constexpr double kMaxLimitBytes = 9e15;  // exact in JavaScript
 constexpr double kMaxLimitDays = 36'500;
 
 // What all mounts are described by.
-struct Surroundings {
+struct MountContext {
     std::int64_t now_s = base::WallSeconds();
     std::vector<maintenance::MountStatus> states;  // as the recorder that runs sees them
     std::vector<store::RecentFootage> recent;
     std::map<int, std::string> camera_names;
 };
 
-Surroundings SurroundingsOf(const Call& call) {
+MountContext ReadMountContext(const Call& call) {
     const base::Installation& installation = call.context.Installation();
-    Surroundings known;
+    MountContext known;
     if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
         known.states = maintenance::ReadMountStatus(installation);
     }
@@ -85,7 +85,7 @@ Condition Inspect(store::Store& records, const store::Mount& mount) {
     return {"ready", "", space};
 }
 
-Condition ConditionOf(store::Store& records, const store::Mount& mount, const Surroundings& known) {
+Condition ConditionOf(store::Store& records, const store::Mount& mount, const MountContext& known) {
     Condition condition;
     try {
         condition = Inspect(records, mount);
@@ -110,7 +110,7 @@ Condition ConditionOf(store::Store& records, const store::Mount& mount, const Su
 }
 
 // By camera, with a name where the camera was not removed. Returns the sum.
-double AddRates(const store::Mount& mount, const Surroundings& known, Json::Value& list) {
+double AddRates(const store::Mount& mount, const MountContext& known, Json::Value& list) {
     double sum = 0;
     list = Json::arrayValue;
     for (const store::RecentFootage& footage : known.recent) {
@@ -145,7 +145,7 @@ Json::Value OrNull(const std::optional<std::int64_t>& number) {
     return number ? Json::Value(Json::Int64{*number}) : Json::Value();
 }
 
-Json::Value Describe(store::Store& records, const store::Mount& mount, const Surroundings& known) {
+Json::Value Describe(store::Store& records, const store::Mount& mount, const MountContext& known) {
     store::Events events(records);
     const Condition condition = ConditionOf(records, mount, known);
     const bool has_size = condition.space && condition.space->total_bytes > 0;
@@ -174,7 +174,7 @@ Json::Value Describe(store::Store& records, const store::Mount& mount, const Sur
 
 std::string AnswerRecord(const Call& call, const store::Mount& mount) {
     Json::Value data;
-    data["mount"] = Describe(call.Records(), mount, SurroundingsOf(call));
+    data["mount"] = Describe(call.Records(), mount, ReadMountContext(call));
     return SuccessAnswer(data);
 }
 
@@ -182,7 +182,7 @@ std::string AnswerRecord(const Call& call, const store::Mount& mount) {
 auto Completer(const Call& call) {
     return [&call](const Json::Value& record) {
         const auto mount = store::Mounts(call.Records()).Find(record["id"].asInt());
-        return mount ? Describe(call.Records(), *mount, SurroundingsOf(call)) : record;
+        return mount ? Describe(call.Records(), *mount, ReadMountContext(call)) : record;
     };
 }
 
@@ -218,7 +218,7 @@ admin::MountChange ChangeOf(const Call& call) {
 }
 
 std::string List(const Call& call) {
-    const Surroundings known = SurroundingsOf(call);
+    const MountContext known = ReadMountContext(call);
     Json::Value data;
     data["mount"] = Json::arrayValue;
     for (const store::Mount& mount : store::Mounts(call.Records()).List()) {

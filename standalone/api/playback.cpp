@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Playback: steers a running player of the caller's session through its progress file and signals.
+// VEXO.Playback: controls a running player of the caller's session through its progress file and signals.
 #include <algorithm>
 #include <chrono>
 #include <functional>

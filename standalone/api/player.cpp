@@ -16,7 +16,7 @@ namespace {
 constexpr const char* kPlayerApi = "VEXO.Lookhaven.Player";
 constexpr const char* kByFrames = "PlayMjpegEvent";
 constexpr const char* kByTimes = "PlayMjpegEventNoFrameId";
-constexpr int kUsualSideBySide = 9;  // three by three cameras of one moment
+constexpr int kDefaultPlayers = 9;  // three by three cameras of one moment
 constexpr int kMaxSideBySide = 16;
 
 int IntOr(const Call& call, const char* name, int fallback) {
@@ -31,7 +31,7 @@ bool IsPlayer(const Call& call) {
 }
 
 int PlayersPerSession(store::Store& records) {
-    return std::clamp(store::Settings(records).NumberOr("players_per_session", kUsualSideBySide), 1, kMaxSideBySide);
+    return std::clamp(store::Settings(records).NumberOr("players_per_session", kDefaultPlayers), 1, kMaxSideBySide);
 }
 
 void PreparePlayer(const Call& call) {

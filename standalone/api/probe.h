@@ -13,7 +13,7 @@
 
 namespace lookhaven::api {
 
-// The method Probe of VEXO.Camera. Confines this process. Throws Failure 429 while a few others are at it.
+// The method Probe of VEXO.Camera. Confines this process. Throws Failure 429 while three probes are running.
 std::string ProbeCamera(const Call& call);
 
 }  // namespace lookhaven::api

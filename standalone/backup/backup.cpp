@@ -213,7 +213,7 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     {
         store::Store copy = store::Store::Open(SqliteUrl(records));
         summary.records = CopyRecords(store, copy, store::CopySessions::kNo);
-        store::GatherInOneFile(copy);
+        store::CheckpointWal(copy);
     }
     BackupWriter writer(descriptor);
     writer.Add(kRecords, records);

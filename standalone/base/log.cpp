@@ -36,7 +36,7 @@ void Log(Severity severity, std::string_view text) noexcept try {
     std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
                        kSeverityNames[static_cast<std::size_t>(severity)] + ": ";
     line += text.substr(0, text.find_last_not_of("\r\n") + 1);
-    // A line stays one line, and nothing in it steers the terminal that shows it, by a control character of ASCII or,
+    // A line stays one line, and nothing in it controls the terminal that shows it, by a control character of ASCII or,
     // in UTF-8, of those from U+0080 to U+009F.
     std::replace_if(
         line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7f; }, ' ');

@@ -95,7 +95,7 @@ class Zip {
     std::unique_ptr<struct archive, FreeArchive> archive_;
 };
 
-// A name as the file says it, which may be anything: nothing in it steers the terminal.
+// A name as the file says it, which may be anything: it can inject no terminal control sequences.
 std::string Shown(std::string_view name) {
     std::string shown;
     while (!name.empty()) {

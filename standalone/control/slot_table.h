@@ -59,7 +59,7 @@ struct Player {
 enum class Work : std::uint8_t {
     kNone,
     kSearch,   // may take seconds of a processor
-    kProbing,  // of a camera, or a stranger's picture, by a process of its own
+    kProbing,  // of a camera, or an uploaded picture, by a process of its own
     kExport,   // of footage; a search, too, until its answer turns out to be a stream
     kWatch,    // of what is being reported, for as long as the client likes
 };

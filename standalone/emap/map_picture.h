@@ -2,7 +2,7 @@
 //
 // What may become the picture of an e-map.
 //
-// Why so        A picture comes from a stranger's disk, and every viewer's browser decodes it. So a process of its own,
+// Why so        A picture is untrusted input, and every viewer's browser decodes it. So a process of its own,
 //               which can do nothing else, decodes it first, and what that process makes of the pixels is stored: no
 //               other byte of the file goes on.
 #pragma once
@@ -15,12 +15,12 @@
 
 namespace lookhaven::emap {
 
-// Of a file that is drawn anew; what comes of it has kMaxPictureBytes at most (pictures.h).
+// Of a file that is re-encoded; what comes of it has kMaxPictureBytes at most (pictures.h).
 constexpr std::size_t kMaxUploadBytes = 20U << 20U;
 
 class MapPicture {
   public:
-    // A PNG, JPEG or WebP file, drawn anew as PNG or JPEG; takes 30 seconds at most. Forks: call it without a store
+    // A PNG, JPEG or WebP file, re-encoded as PNG or JPEG; takes 30 seconds at most. Forks: call it without a store
     // open, in a process with one thread. confine: gives up, in the new process, what it got from this one beside
     // descriptors, which are closed. Throws store::InvalidRecord, which says what is wrong with the file,
     // std::system_error where no process can decode it.

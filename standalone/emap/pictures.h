@@ -2,7 +2,7 @@
 //
 // The picture files of e-maps, in the folder "emaps" of the state folder.
 //
-// Why so        A picture comes from a stranger's disk: its type is learned from what it holds, its file is named by
+// Why so        A picture is untrusted input: its type is learned from what it holds, its file is named by
 //               us, and a name out of the store opens no file elsewhere. The file is complete on disk before a map
 //               names it, so that a map never loses its picture to a crash.
 #pragma once

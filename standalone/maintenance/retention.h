@@ -42,7 +42,7 @@ struct DiskWatch {
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
                                 DiskWatch& watch);
 
-// What the mount's own limits would have EnforceRetention delete by and by, without what a full disk adds.
+// What the mount's own limits would have EnforceRetention delete over time, without what a full disk adds.
 struct RetentionForecast {
     std::int64_t events = 0;
     std::int64_t bytes = 0;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Makes a picture that a stranger gave anew: what was in its file beside the pixels is gone.
+// Re-encodes an untrusted picture: what was in its file beside the pixels is gone.
 #pragma once
 
 #include <cstddef>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a process gives up before it decodes one picture that a stranger made.
+// What a process gives up before it decodes one untrusted picture.
 //
 // Why so        A decoder may have faults that a picture makes use of. Once the picture is in memory, decoding needs
 //               memory and a place for the result, and nothing else of the kernel.

@@ -17,7 +17,7 @@ using maintenance::RecordingState;
 
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
-constexpr std::int64_t kTryAgainUs = 1'000'000;
+constexpr std::int64_t kRetryUs = 1'000'000;
 // Until the recorder knows of a mark, or has a number for the event: it asks the store once a second, which may be
 // slow.
 constexpr int kMaxWaitSeconds = 2;
@@ -27,7 +27,7 @@ constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
 // Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk
 // that stays broken could not be unmounted.
-constexpr std::int64_t kFinishForUs = 60'000'000;
+constexpr std::int64_t kFinishTimeoutUs = 60'000'000;
 constexpr std::size_t kMaxUnfinished = 4;
 // Split here even where no key frame comes or the next event has no number.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
@@ -44,7 +44,7 @@ CameraRecorder::CameraRecorder(int camera, RecorderContext context) : camera_(ca
 CameraRecorder::~CameraRecorder() {
     Close();
     finish_again_us_ = 0;
-    FinishLeft();
+    FinishPending();
     while (!unfinished_.empty()) {
         GiveUp(unfinished_.begin());
     }
@@ -93,19 +93,19 @@ void CameraRecorder::Tick() {
         next_mount_check_us_ = now_us + kMountCheckUs;
         CheckMount();
     }
-    FinishLeft();
+    FinishPending();
     if (!event_) {
         Begin();
     }
 }
 
 // A disk that was full, away or read-only for a moment must not leave files that look as if a crash had.
-void CameraRecorder::FinishLeft() {
+void CameraRecorder::FinishPending() {
     const std::int64_t now_us = context_.monotonic_us();
     if (unfinished_.empty() || now_us < finish_again_us_) {
         return;
     }
-    finish_again_us_ = now_us + kTryAgainUs;
+    finish_again_us_ = now_us + kRetryUs;
     std::erase_if(unfinished_, [&](const Unfinished& left) {
         try {
             left.event->Close();
@@ -284,14 +284,14 @@ void CameraRecorder::Pause(RecordingState state, const std::string& reason) {
                     std::ranges::find_if(unfinished_, [](const Unfinished& left) { return !left.event->HasFrames(); });
                 GiveUp(without_frames != unfinished_.end() ? without_frames : unfinished_.begin());
             }
-            unfinished_.push_back({std::move(event_), context_.monotonic_us() + kFinishForUs});
+            unfinished_.push_back({std::move(event_), context_.monotonic_us() + kFinishTimeoutUs});
         }
         event_.reset();
     }
     if (std::exchange(state_, state) != state) {
         base::LogWarning("recording of camera " + std::to_string(camera_) + " pauses: " + reason);
     }
-    try_again_us_ = context_.monotonic_us() + kTryAgainUs;
+    try_again_us_ = context_.monotonic_us() + kRetryUs;
     if (state == RecordingState::kDiskFull) {
         context_.need_space();
     }

@@ -86,7 +86,7 @@ class CameraRecorder {
     template <class Work>
     bool Guard(Work&& work);
     void Pause(maintenance::RecordingState state, const std::string& reason);
-    void FinishLeft();
+    void FinishPending();
     void GiveUp(std::vector<Unfinished>::iterator left);
 
     const int camera_;

@@ -97,13 +97,13 @@ Connection::Transaction::Transaction(Connection& connection)
       open_transactions_(connection.open_transactions_),
       is_part_(open_transactions_++ > 0) {}
 
-Connection::Transaction::Transaction(Connection& connection, Durability durability, Patience patience)
+Connection::Transaction::Transaction(Connection& connection, Durability durability, LockWait lock_wait)
     : Transaction(connection) {  // so the destructor restores the settings when this fails, too
     if (is_part_) {
         return;
     }
     const bool is_lazy = durability == Durability::kLazy;
-    const bool gives_up = patience == Patience::kGivesUp;
+    const bool gives_up = lock_wait == LockWait::kNone;
     if (connection.IsSqlite()) {
         if (is_lazy) {
             SetUntilEnd("synchronous", "normal", "full");  // takes no effect inside a transaction

@@ -24,7 +24,7 @@ enum class Durability { kSafe, kLazy };
 
 // Whether a change waits for another writer, or fails at once: what can as well be done later must not hold up a
 // request.
-enum class Patience { kWaits, kGivesUp };
+enum class LockWait { kUsual, kNone };
 
 // A store's URL, parsed.
 struct StoreAddress {
@@ -58,9 +58,9 @@ class Connection {
     // Calls change(session) inside a transaction, which is rolled back when change throws. Inside another Write it is a
     // part of that one, and what it throws must end that one.
     template <typename Change>
-    auto Write(Change&& change, Durability durability = Durability::kSafe, Patience patience = Patience::kWaits) {
+    auto Write(Change&& change, Durability durability = Durability::kSafe, LockWait lock_wait = LockWait::kUsual) {
         return Read([&](soci::session& sql) {
-            Transaction transaction(*this, durability, patience);
+            Transaction transaction(*this, durability, lock_wait);
             if constexpr (std::is_void_v<decltype(change(sql))>) {
                 change(sql);
                 transaction.Commit();
@@ -100,7 +100,7 @@ class Connection {
   private:
     class Transaction {
       public:
-        Transaction(Connection& connection, Durability durability, Patience patience);
+        Transaction(Connection& connection, Durability durability, LockWait lock_wait);
         Transaction(const Transaction&) = delete;
         Transaction& operator=(const Transaction&) = delete;
         ~Transaction();

@@ -196,7 +196,7 @@ void RequireTablesOnly(const std::string& url) {
     }
 }
 
-void GatherInOneFile(Store& store) {
+void CheckpointWal(Store& store) {
     if (store.connection().FetchOne<std::string>("pragma journal_mode = delete") != "delete") {
         throw StoreError("the records could not be written to one file");
     }

@@ -15,7 +15,7 @@ enum class CopySessions { kNo, kYes };
 // Throws InvalidRecord for a store with accounts, cameras or recordings of its own.
 void RequireUnused(Store& store);
 
-// For a SQLite file that a stranger may have made, before it is used in any other way: throws InvalidRecord when it
+// For a SQLite file that is untrusted, before it is used in any other way: throws InvalidRecord when it
 // holds views, triggers or virtual tables but our own, which would run statements of theirs.
 void RequireTablesOnly(const std::string& url);
 
@@ -25,6 +25,6 @@ void RequireTablesOnly(const std::string& url);
 std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions);
 
 // Has all of a SQLite store in its one file, which may be copied once the store is closed. Throws StoreError.
-void GatherInOneFile(Store& store);
+void CheckpointWal(Store& store);
 
 }  // namespace lookhaven::store

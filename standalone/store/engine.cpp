@@ -15,16 +15,16 @@ namespace lookhaven::store {
 namespace {
 
 // Statements as requests make them, on a store in memory: a function of a library is bound by its first call.
-void RehearseSqlite() {
+void WarmUpSqlite() {
     {
         Connection connection({Engine::kSqlite, ":memory:"});
         connection.Write([](soci::session& sql) {
-            sql << "create table rehearsal (id integer, name text)";
-            Execute(sql, "insert into rehearsal (id, name) values (:id, :name)", 1, std::string("one"));
+            sql << "create table warm_up (id integer, name text)";
+            Execute(sql, "insert into warm_up (id, name) values (:id, :name)", 1, std::string("one"));
         });
-        connection.HasTable("rehearsal");
-        connection.FetchAll<std::pair<int, std::string>>(
-            "select id, name from rehearsal where name = :name order by id", std::string("one"));
+        connection.HasTable("warm_up");
+        connection.FetchAll<std::pair<int, std::string>>("select id, name from warm_up where name = :name order by id",
+                                                         std::string("one"));
     }
     sqlite_api::sqlite3_randomness(0, nullptr);  // else all processes would go on with the same numbers
 }
@@ -49,7 +49,7 @@ void PrepareEngine(const std::string& url) {
     if (StoreAddress::Parse(url).engine == Engine::kPostgresql) {
         Postgresql();
     } else {
-        RehearseSqlite();
+        WarmUpSqlite();
     }
 }
 

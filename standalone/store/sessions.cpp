@@ -91,8 +91,7 @@ bool Sessions::Touch(const Session& session, std::int64_t now_s) {
                        " where handle = :handle and last_seen <= :due",
                        now_s, EndOf(lifetime_, session.created_s, now_s), session.handle, now_s - kTouchEveryS) > 0;
     };
-    return now_s >= session.last_seen_s + kTouchEveryS &&
-           connection_.Write(touch, Durability::kLazy, Patience::kGivesUp);
+    return now_s >= session.last_seen_s + kTouchEveryS && connection_.Write(touch, Durability::kLazy, LockWait::kNone);
 }
 
 std::string Sessions::Key() {
@@ -148,7 +147,7 @@ std::vector<std::string> Sessions::EndedAmong(const std::vector<std::string>& ha
 int Sessions::PurgeExpired(std::int64_t now_s) {
     return connection_.Write(
         [&](soci::session& sql) { return Execute(sql, "delete from sessions where expires <= :now", now_s); },
-        Durability::kLazy, Patience::kGivesUp);
+        Durability::kLazy, LockWait::kNone);
 }
 
 }  // namespace lookhaven::store

@@ -4,7 +4,7 @@
 //
 // Why so        The handle becomes part of file names and log lines, so it must open nothing; and a copy of the store
 //               must not log anybody in, so it holds only a hash of the secret. A keyed tag in the secret lets who
-//               has no store tell an invented one at the cost of a hash.
+//               has no store tell a forged one at the cost of a hash.
 #pragma once
 
 #include <cstddef>

@@ -66,7 +66,7 @@ void Describe(CLI::App& app, Options& options) {
 }
 
 // A part of the requests is kept for log-ins, and another for managers: whatever viewers do, an owner gets in.
-void KeepSome(Options& options) {
+void ReserveSlots(Options& options) {
     const std::size_t requests = options.limits.requests;
     options.limits.kept_for_log_in = requests / 32;
     options.requests.without_managers = requests - requests / 32 - requests / 16;
@@ -117,7 +117,7 @@ int main(int count, char** arguments) {
     CLI::App app("Hosts web API modules behind a web server that speaks SCGI.");
     Describe(app, options);
     CLI11_PARSE(app, count, arguments);
-    KeepSome(options);
+    ReserveSlots(options);
     try {
         Run(options);
     } catch (const std::exception& error) {

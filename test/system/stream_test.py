@@ -38,12 +38,12 @@ class StreamTest(unittest.TestCase):
         cls.server = cls.enterClassContext(Installation())
 
     def test_a_thousand_cut_connections_leave_nothing_behind(self):
-        dice = random.Random(20260301)
+        rng = random.Random(20260301)
         head = f"Host: localhost\r\nConnection: close\r\nCookie: id={self.server.session('admin')}\r\n\r\n"
         load = "/webapi?api=VEXO.Lookhaven.Player&version=1&method=LoadCamera"
         plans = [
-            (f"GET {dice.choice([PLAY + '1', PLAY + '4', PLAY + '1&snapshot=1', load])} HTTP/1.1\r\n{head}".encode(),
-             dice.choice(["ask", "read", "read", "read"]), dice.random())
+            (f"GET {rng.choice([PLAY + '1', PLAY + '4', PLAY + '1&snapshot=1', load])} HTTP/1.1\r\n{head}".encode(),
+             rng.choice(["ask", "read", "read", "read"]), rng.random())
             for _ in range(1000)
         ]
 

@@ -21,7 +21,7 @@ ROOT = pathlib.Path(__file__).resolve().parents[2]
 sys.path[:0] = [str(ROOT / "test/system"), str(ROOT / "bench")]
 from installation import LIVE, PASSWORDS, Installation, children, program, wait_until  # noqa: E402
 from postgres import Postgres  # noqa: E402
-from surroundings import RESTART_S, Clock, Watcher, last_frame_s  # noqa: E402
+from environment import RESTART_S, Clock, Watcher, last_frame_s  # noqa: E402
 
 MAX_LOST_S = 1.0  # of footage, by a killed recorder
 CLOCKS_S = (0, 10, -10, 3600, -3600, 7200)  # ahead of the machine's

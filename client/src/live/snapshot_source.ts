@@ -17,7 +17,7 @@ export class SnapshotSource implements LiveSource {
   readonly #camera: Camera;
   readonly #semaphore: Semaphore;
 
-  /** `turns` is shared by all that poll the same server. */
+  /** `semaphore` is shared by all that poll the same server. */
   constructor(server: Server, camera: Camera, semaphore: Semaphore) {
     this.#server = server;
     this.#camera = camera;

@@ -224,7 +224,7 @@ function rawEvent({ id, start, stop, frames, reason = 1, isGrowing = false, note
 }
 
 function rawMark({ id, kind, camera, start, stop, text = "" }: Recorded) {
-  return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", reported_by: "till", text: text.split("\n") };
+  return { id, kind, camera_id: camera, time: start + 5, start, stop, state: "saved", reported_by: "terminal", text: text.split("\n") };
 }
 
 /** Of a camera of constant frame rate. */

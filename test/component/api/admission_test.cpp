@@ -72,14 +72,14 @@ TEST(FalseSession, CostsNoProcess) {
     const HostUnderTest host({"--max-requests", "1"});
     const std::string body(1 << 20, 'x');
     const std::string real = host.LogIn().secret;
-    std::string invented = real;
-    invented.front() = real.front() == '0' ? '1' : '0';
+    std::string forged = real;
+    forged.front() = real.front() == '0' ? '1' : '0';
     const auto status = [&](const std::string& cookie) {
         return host.Ask("api=Test&version=1&method=Success", cookie, {}, body).status;
     };
     const base::FileDescriptor stream = host.Open("Stream", real);
     // Each more than once: the connection before may still be there, and the host waits for one request alone.
-    for (const std::string& cookie : {invented, std::string(64, 'a') + "; other=" + invented}) {
+    for (const std::string& cookie : {forged, std::string(64, 'a') + "; other=" + forged}) {
         EXPECT_TRUE(host::Eventually(std::chrono::seconds(5), [&] { return status(cookie) == 401; }))
             << "all processes are taken, and it needs none";
     }

@@ -22,12 +22,12 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
     users.AllowMarks(2);
     footage_.Record(1, 999'000, 1);
     footage_.Record(2, 1'999'000, 1);
-    const Json::Value sale =
+    const Json::Value transaction =
         Ask(mark, "kind=pos&camera=1&start=1000000&length=20&text=1+Coffee%0A2+Tea").Json()["data"];
-    EXPECT_EQ(sale["kind"], "pos");
-    EXPECT_EQ(sale["state"], "pending");
-    EXPECT_LE(sale["start"].asInt(), 1000000);
-    EXPECT_GE(sale["stop"].asInt(), 1000020);
+    EXPECT_EQ(transaction["kind"], "pos");
+    EXPECT_EQ(transaction["state"], "pending");
+    EXPECT_LE(transaction["start"].asInt(), 1000000);
+    EXPECT_GE(transaction["stop"].asInt(), 1000020);
     const Answer lines = host_.Ask("api=VEXO." + mark, admin_, {{"CONTENT_TYPE", "application/json"}},
                                    R"({"kind": "alert", "camera": 2, "start": 2000000, "text": ["door", "opened"]})");
     EXPECT_EQ(lines.Json()["data"]["text"][1], "opened");

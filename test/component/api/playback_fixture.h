@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A host whose players the tests steer and watch.
+// A host whose players the tests control and watch.
 #pragma once
 
 #include <array>

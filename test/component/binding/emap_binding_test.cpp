@@ -133,15 +133,16 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
         {.kind = EmapItemType::kPos, .name = "POS terminal", .server_id = 1, .id_on_server = 5, .camera_id = 2});
     POS pos;
     ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
-    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 1) << "the camera's id on the till's server";
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 1) << "the camera's id on the terminal's server";
     Call(2);
     ASSERT_EQ(pos.LoadByIdOnRecServer(5, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "nobody learns of a camera that is denied to him";
     Call(1);
-    devices_.Add({.kind = EmapItemType::kPos, .name = "Far till", .server_id = 1, .id_on_server = 6, .camera_id = 1});
+    devices_.Add(
+        {.kind = EmapItemType::kPos, .name = "Far terminal", .server_id = 1, .id_on_server = 6, .camera_id = 1});
     ASSERT_EQ(pos.LoadByIdOnRecServer(6, 1), 0);
-    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "a camera that the till's server does not know";
-    ASSERT_EQ(pos.Load(devices_.Add({.kind = EmapItemType::kPos, .name = "Own till", .camera_id = 2})), 0);
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "a camera that the terminal's server does not know";
+    ASSERT_EQ(pos.Load(devices_.Add({.kind = EmapItemType::kPos, .name = "Own terminal", .camera_id = 2})), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 2) << "whosever the camera is, it has an id here";
 
     EXPECT_EQ(GetCamIdOnHost(1, 1), 2);

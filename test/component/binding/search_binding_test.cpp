@@ -21,7 +21,7 @@ namespace {
 TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
     const int event = footage_.Record(2, kNoon, 3);
     const int alert = footage_.Mark(REC_EVENT_ALERT, 2, kNoon, 2, "door", event);
-    const int sale = footage_.Mark(REC_EVENT_POS, 2, kNoon, 2, "1 coffee", event);
+    const int transaction = footage_.Mark(REC_EVENT_POS, 2, kNoon, 2, "1 coffee", event);
     store::Users(records_).Deny(2, 2, {store::CameraAccess::kPlayback});
     const int group = store::Groups(records_).Add({0, "all", {1, 2}});
     const struct {
@@ -42,7 +42,7 @@ TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
         const int refused = each.sees ? 0 : -1;
         EXPECT_EQ(Event().Load(event, 0, 0, 0), refused) << each.who;
         EXPECT_EQ(AlertEvent().Load(alert, 0, 0, 0), refused) << each.who;
-        EXPECT_EQ(PosEvent().Load(sale, 0, 0, 0), refused) << each.who;
+        EXPECT_EQ(PosEvent().Load(transaction, 0, 0, 0), refused) << each.who;
         Camera camera;
         ASSERT_EQ(camera.Load(2, 0, 0), 0) << "handlers filter the records themselves";
         EXPECT_EQ(camera.GetStoragePath().empty(), !each.sees) << each.who;
@@ -68,7 +68,7 @@ TEST_F(FootageBinding, RefusesWhatTheCallerMayNotPlayBack) {
                                                      {-1, 0, 0, 0}}) {
         EXPECT_NE(Event().Load(id, mount, server, archive), 0) << id << ' ' << mount << ' ' << server << ' ' << archive;
     }
-    EXPECT_NE(AlertEvent().Load(sale, 0, 0, 0), 0) << "another kind";
+    EXPECT_NE(AlertEvent().Load(transaction, 0, 0, 0), 0) << "another kind";
     EXPECT_NE(CamGroup().Load(99), 0);
     AlertEvent loaded;
     ASSERT_EQ(loaded.Load(alert, 0, 0, 0), 0);

@@ -106,7 +106,7 @@ TEST_F(RunningHost, TellsTheHandlerWhoCalls) {
 
 TEST_F(RunningHost, GivesTheHandlerAFreshProcess) {
     const base::FileDescriptor other = OpenStream(host_, admin_);
-    const Json::Value found = host_.Ask("api=Test&version=1&method=Surroundings", admin_).Json()["data"];
+    const Json::Value found = host_.Ask("api=Test&version=1&method=Environment", admin_).Json()["data"];
     EXPECT_EQ(found["masked"].size(), 0U);
     Json::Value ignored;
     for (const int number : {SIGHUP, SIGINT, SIGQUIT, SIGUSR1, SIGUSR2, SIGPIPE}) {

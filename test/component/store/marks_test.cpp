@@ -51,18 +51,19 @@ TEST_P(MarkTest, AMarkHasTheFootageThatItsCamerasPlanAsksFor) {
     EXPECT_FALSE(marks_.Remove(pos.id) || marks_.Save(pos.id, 7, "x") || marks_.Miss(pos.id));
 
     EXPECT_THROW(marks_.Add(MarkKind::kAlert, 99, 100, 0, ""), NotFound);
-    const Mark told = marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, kDay);
-    EXPECT_EQ(marks_.Find(MarkKind::kAlert, told.id)->reporter, (Reporter{7, "till"}));
+    const Mark told = marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "terminal"}, kDay);
+    EXPECT_EQ(marks_.Find(MarkKind::kAlert, told.id)->reporter, (Reporter{7, "terminal"}));
     for (int of = 0; of < 2; ++of) {
         EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {}, kDay, 1)) << "nobody's";
     }
-    EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1), TooManyMarks) << "waits";
+    EXPECT_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "terminal"}, 2 * kDay, 1), TooManyMarks)
+        << "waits";
     EXPECT_TRUE(marks_.Miss(told.id));
-    EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "till"}, 2 * kDay, 1)) << "a day later";
+    EXPECT_NO_THROW(marks_.Add(MarkKind::kAlert, camera, 100, 0, "", {7, "terminal"}, 2 * kDay, 1)) << "a day later";
     std::atomic<int> added = 0;
     InParallel(6, [&](Store& store) {
         try {
-            Marks(store).Add(MarkKind::kAlert, camera, 100, 0, "", {8, "till"}, kDay, 2);
+            Marks(store).Add(MarkKind::kAlert, camera, 100, 0, "", {8, "terminal"}, kDay, 2);
             ++added;
         } catch (const TooManyMarks&) {
         }

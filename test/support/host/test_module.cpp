@@ -49,7 +49,7 @@ void Stream(int deaf_pictures) {
 }
 
 // What a request process finds around itself.
-Json::Value Surroundings() {
+Json::Value Environment() {
     Json::Value found;
     found["masked"] = found["ignored"] = Json::arrayValue;
     sigset_t mask;
@@ -168,7 +168,7 @@ const Row kTable[] = {
          response->SetSuccess(static_cast<Json::UInt>(events.size()));
      }},
     {"Test", 1, "Crash", [](APIRequest*, APIResponse*) { std::abort(); }},
-    {"Test", 1, "Surroundings", [](APIRequest*, APIResponse* response) { response->SetSuccess(Surroundings()); }},
+    {"Test", 1, "Environment", [](APIRequest*, APIResponse* response) { response->SetSuccess(Environment()); }},
     {"Test", 1, "Caller", [](APIRequest* request, APIResponse* response) { response->SetSuccess(Caller(*request)); }},
     {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "Nothing", Nothing},
     {"VEXO.Lookhaven.Player.LiveviewSrc", 1, "EmptyStream", EmptyStream},

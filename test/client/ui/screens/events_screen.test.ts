@@ -48,7 +48,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const offset = -new Date(noon * 1000).getTimezoneOffset();
     expect(link).toBe(`webapi?api=VEXO.Event&version=1&method=Download&event=90&kind=pos&utc_offset_min=${offset}`);
     await page.locator(".row-text", { hasText: /^2 Tea <b> · Total 5$/ }).waitFor({ state: "attached" });
-    await page.waitForSelector("[data-ref=pos90] button[title$='Reported by till']");
+    await page.waitForSelector("[data-ref=pos90] button[title$='Reported by terminal']");
   }, 40_000);
 
   test("words find what an alert or a receipt says, at any time, marked; a click plays it", async () => {
