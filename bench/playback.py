@@ -2,7 +2,7 @@
 """Playback of recorded events: frames a second and processor time beside ffmpeg, the first picture, and the pace.
 
 An hour of 25 pictures a second, as Motion JPEG of 640x360 and as H.264 of 1280x720 with a key frame every two seconds, is put
-on the mount and taken in as a recorder's would be. Prints four Markdown tables.
+on the mount and imported as a recorder's would be. Prints four Markdown tables.
 """
 
 import dataclasses
@@ -50,7 +50,7 @@ class Recorded:
 
 
 def record_hour(stand, camera, codec):
-    """An hour on the mount, without an index or a row: what verify takes in, under a number of its own."""
+    """An hour on the mount, without an index or a row: what verify imports, under an id of its own."""
     day = time.strftime("%Y-%m-%d", time.gmtime(START))
     folder = stand.mount / str(camera) / day
     folder.mkdir(parents=True)

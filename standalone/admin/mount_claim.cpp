@@ -48,7 +48,7 @@ void MarkFolder(store::Store& store, const store::Mount& mount) {
     maintenance::MountFolder::WriteMarker(mount.path, maintenance::MarkerFor(store, mount.id));
 }
 
-void ReserveNumbers(store::Store& store, const store::Mount& mount) {
+void ReserveIds(store::Store& store, const store::Mount& mount) {
     const auto folder = maintenance::OpenMount(store, mount);
     int last_event = 0;
     for (const auto& file : folder ? folder->Files() : std::vector<maintenance::MountFolder::File>()) {

@@ -32,8 +32,8 @@ void RequireFreeFolder(store::Store& store, const std::string& path, int mount_i
 // Marks the folder as that of the mount. Throws std::system_error.
 void MarkFolder(store::Store& store, const store::Mount& mount);
 
-// Keeps later cameras and events from getting the numbers of footage that is there. Reads the names of all files of
+// Keeps later cameras and events from getting the ids of footage that is there. Reads the names of all files of
 // the mount, which is marked. Throws std::system_error and store::StoreError.
-void ReserveNumbers(store::Store& store, const store::Mount& mount);
+void ReserveIds(store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::admin

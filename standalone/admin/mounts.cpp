@@ -77,7 +77,7 @@ store::Mount AddMount(store::Store& store, const Actor& actor, const MountChange
         MarkFolder(store, mount);
         return Change{"mount.add", Named(mount.name, mount.id), {}, MountRecord(mount)};
     });
-    ReserveNumbers(store, mount);
+    ReserveIds(store, mount);
     return mount;
 }
 
@@ -107,7 +107,7 @@ store::Mount SetMount(store::Store& store, const Actor& actor, int id, std::opti
         return Change{"mount.set", Named(mount.name, id), MountRecord(before), MountRecord(mount)};
     });
     if (is_marked) {
-        ReserveNumbers(store, mount);
+        ReserveIds(store, mount);
     }
     return mount;
 }

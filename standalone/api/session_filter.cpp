@@ -16,8 +16,9 @@
 namespace lookhaven::api {
 
 struct SessionFilter::Page {
-    std::atomic<unsigned int>
-        learnt;  // keys; the last of them is in its turn, and the one before stays while it may be read
+    // How many keys there have been. The newest is at that count modulo 2; the one before it stays in the other place,
+    // where a reader may still be reading it.
+    std::atomic<unsigned int> learnt;
     std::array<std::array<char, store::Sessions::kKeyDigits>, 2> keys;
 
     std::string_view Key() const {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recorded, alert and POS transactions as the store has them, of cameras that the caller may play back.
+// Recorded events, alerts and POS transactions as the store has them, of cameras that the caller may play back.
 #include "platform/recording/event.h"
 
 #include <algorithm>

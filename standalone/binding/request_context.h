@@ -87,8 +87,8 @@ class LH_PLATFORM_API RequestContext {
     RequestContext& operator=(const RequestContext&) = delete;
 
     // In a process that waits for its request: opens the store if that is a file, and goes once the way through it that
-    // requests go. Begin closes it when the installation has another store, or the store another
-    // schema, by then. Throws store::StoreError.
+    // requests go. Begin closes it when the installation has another store, or the store another schema, by then.
+    // Throws store::StoreError.
     void OpenRecordsAhead(const base::Installation& installation);
 
     // Borrows output for the rest of the process's life, null where nothing is sent.

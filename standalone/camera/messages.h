@@ -4,8 +4,7 @@
 //
 //   recorder        one request: the length of its body, then the body
 //   camera process  kConfined, perhaps kFormat of its sound, kOpened; then kFormat of its picture before its first
-//   frame
-//                   and whenever it changes, and frames; kFailure instead of any of them ends it
+//                   frame and whenever it changes, and frames; kFailure instead of any of them ends it
 //
 // Both run on one machine and come from one build, so numbers are in the machine's own byte order.
 #pragma once

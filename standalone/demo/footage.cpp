@@ -13,7 +13,7 @@
 #include "standalone/demo/outcome.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/salvage.h"
+#include "standalone/maintenance/recording_recovery.h"
 #include "standalone/media/recording_writer.h"
 #include "standalone/pattern/pattern_audio.h"
 #include "standalone/pattern/pattern_encoder.h"

@@ -20,8 +20,8 @@ struct CameraFootage {
     int id = 0;
     std::string name = {};
     bool with_sound = true;
-    std::vector<std::filesystem::path> recordings =
-        {};  // absolute, in the order of time; those that are gone are left out
+    // Absolute, in the order of time; those that are gone are left out.
+    std::vector<std::filesystem::path> recordings = {};
 };
 
 struct Request {

@@ -6,7 +6,7 @@
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/deletion.h"
-#include "standalone/maintenance/salvage.h"
+#include "standalone/maintenance/recording_recovery.h"
 
 namespace lookhaven::maintenance {
 
@@ -30,16 +30,16 @@ bool Try(Work&& work) {
     }
 }
 
-bool AdoptRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_reserved_id,
-                 std::int64_t now_s) {
+bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_reserved_id,
+                  std::int64_t now_s) {
     bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
         if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_reserved_id &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
             is_complete &= Try([&] {
                 const int new_id = events.NextId();
-                return AdoptRecording(events, mount, mount_id, file.name, new_id,
-                                      std::min(first_reserved_id, new_id + 1));
+                return ImportRecording(events, mount, mount_id, file.name, new_id,
+                                       std::min(first_reserved_id, new_id + 1));
             });
         }
     }
@@ -63,7 +63,7 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    return AdoptRecent(events, *folder, mount.id, first_reserved_id, now_s) && is_complete;
+    return ImportRecent(events, *folder, mount.id, first_reserved_id, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

@@ -14,7 +14,7 @@
 #include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/marks.h"
-#include "standalone/maintenance/salvage.h"
+#include "standalone/maintenance/recording_recovery.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
 
@@ -178,7 +178,7 @@ class Verification {
         }
         const std::int64_t newest_s = base::WallSeconds() - kMinAgeS;
         std::vector<MountFolder::File> files = mount.Files();
-        // Adopted in the order of recording, as far as dates tell.
+        // Imported in the order of recording, as far as dates tell.
         std::ranges::sort(files, {}, [](const MountFolder::File& file) { return file.name.start_s; });
         if (repair_) {
             store::Mounts(store_).ReserveIds(mount.LastCamera(), 0);
@@ -230,7 +230,7 @@ class Verification {
             if (has_recorder && new_id == name.event) {
                 new_id = events_.NextId();
             }
-            return AdoptRecording(events_, mount, mount_id, name, new_id, has_recorder ? listed_below_ : new_id + 1);
+            return ImportRecording(events_, mount, mount_id, name, new_id, has_recorder ? listed_below_ : new_id + 1);
         });
     }
 

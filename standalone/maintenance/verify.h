@@ -5,7 +5,7 @@
 // Invariants    (1) Without repair nothing is changed.
 //               (2) No unknown file is touched, nor anything outside the mounts.
 //               (3) Repair leaves a mount alone as soon as its disk fails: only ENOENT and ENOTDIR mean absent.
-//               (4) While the store has no event of a mount that holds recordings, repair adopts them and removes
+//               (4) While the store has no event of a mount that holds recordings, repair imports them and removes
 //               nothing.
 // Thread safety One thread. A recorder may run at the same time: what it is writing is left alone, and so is a finished
 //               file whose row it may still hold in memory.

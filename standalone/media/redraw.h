@@ -28,8 +28,8 @@ struct Redrawn {
 
 // type: "png", "jpg" or "webp", as which the file is decoded. A JPEG becomes an upright JPEG, a WebP of lossy
 // compression without transparency a JPEG as well. Any other becomes a PNG, or where that exceeds max_bytes and
-// nothing of it can be transparent, a JPEG. Starts no thread; takes up to 15 bytes and 0.2 µs a
-// pixel. Throws std::bad_alloc.
+// nothing of it can be transparent, a JPEG. Starts no thread; takes up to 15 bytes and 0.2 µs a pixel.
+// Throws std::bad_alloc.
 Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes);
 
 }  // namespace lookhaven::media

@@ -18,7 +18,7 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kRetryUs = 1'000'000;
-// Until the recorder knows of a mark, or has a number for the event: it asks the store once a second, which may be
+// Until the recorder knows of a mark, or has an id for the event: it asks the store once a second, which may be
 // slow.
 constexpr int kMaxWaitSeconds = 2;
 // Events that begin for a camera's times alone: so many at once, and then one in each interval.
@@ -29,7 +29,7 @@ constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a c
 // that stays broken could not be unmounted.
 constexpr std::int64_t kFinishTimeoutUs = 60'000'000;
 constexpr std::size_t kMaxUnfinished = 4;
-// Split here even where no key frame comes or the next event has no number.
+// Split here even where no key frame comes or the next event has no id.
 constexpr std::int64_t kMaxEventUs = (base::kMaxRecordingSeconds - 60) * 1'000'000;
 
 bool IsFull(const std::exception& failure) {
@@ -182,7 +182,7 @@ bool CameraRecorder::MustEndBefore(const Frame& frame) {
            start.reason != Reason();
 }
 
-// A camera decides its own times, and each event costs what cameras share: a file, a row, a number.
+// A camera decides its own times, and each event costs what cameras share: a file, a row, an id.
 bool CameraRecorder::MayCutByTimes() {
     const std::int64_t now_us = context_.monotonic_us();
     cuts_paid_until_us_ = std::max(cuts_paid_until_us_, now_us - kCutsAtOnce * kCutIntervalUs);
@@ -193,7 +193,7 @@ bool CameraRecorder::MayCutByTimes() {
     return true;
 }
 
-// As long as the store has given out no number for the next event, this one goes on.
+// As long as the store has assigned no id for the next event, this one goes on.
 bool CameraRecorder::IsOverdue(std::int64_t length_us) const {
     return length_us >= std::int64_t{request_.plan.segment_s} * 1'000'000 && context_.rows.HasId();
 }
@@ -237,7 +237,7 @@ std::optional<EventStart> CameraRecorder::Prepare(std::int64_t first_us) {
     }
     const std::optional<int> id = context_.rows.TakeId();
     if (!id) {
-        Pause(RecordingState::kNoEventId, "the store has given out no number for an event yet");
+        Pause(RecordingState::kNoEventId, "the store has not assigned an id for an event yet");
         return std::nullopt;
     }
     return EventStart{*id, camera_, request_.plan.mount_id, request_.plan.mount, WallOf(first_us), first_us, Reason()};

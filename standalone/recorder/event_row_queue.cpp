@@ -195,7 +195,7 @@ bool EventRowQueue::StoreRow(store::Events& events, int id) {
             events.Finish(id, row.end_s, row.frame_count, row.size_bytes);
         }
     } catch (const store::AlreadyExists&) {
-        // The answer to an earlier insert was lost, or verify has adopted the file. The next round updates the row.
+        // The answer to an earlier insert was lost, or verify has imported the file. The next round updates the row.
         const std::lock_guard lock(mutex_);
         entries_.at(id).is_stored = true;
         entries_.at(id).is_dirty = true;

@@ -29,7 +29,7 @@ MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, boo
       context_(std::move(context)),
       disk_watch_{maintenance::SpaceWatch(is_space_held), maintenance::SpaceWatch(is_space_held)},
       status_{mount_id, is_space_held ? MountState::kSpaceHeld : MountState::kReady, ""},
-      thread_(context_.store_url, "look after mount " + std::to_string(mount_id),
+      thread_(context_.store_url, "maintain mount " + std::to_string(mount_id),
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
 void MountMaintenance::Pause::Begin(std::int64_t now_us) {
@@ -46,7 +46,7 @@ void MountMaintenance::Work(store::Store& store) {
     const std::int64_t now_us = base::MonotonicMicros();
     const std::int64_t now_s = base::WallSeconds();
     const Clock clock{now_s, clock_watch_.IsTrusted(now_us, now_s)};
-    // Without numbers of its own the recorder could not tell its events from those of another one.
+    // Without ids of its own the recorder could not tell its events from those of another one.
     if (!context_.first_reserved_id()) {
         is_recovered_ = false;
         return;
@@ -126,7 +126,7 @@ void MountMaintenance::SetStatus(MountState state, const std::string& reason) {
     }
     const std::string name = "mount " + std::to_string(mount_id_);
     if (state == MountState::kReady) {
-        base::LogInfo(name + " is looked after again");
+        base::LogInfo(name + " is being maintained again");
     } else {
         base::LogWarning(name +
                          (state == MountState::kFailing     ? " fails: "

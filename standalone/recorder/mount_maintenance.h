@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Looks after one mount in a thread of its own: recovery, the footage of marks, retention.
+// Maintains one mount in a thread of its own: recovery, the footage of marks, retention.
 //
-// Why so        A disk that fails or hangs must not keep the other mounts from being looked after.
+// Why so        A disk that fails or hangs must not keep the other mounts from being maintained.
 // Thread safety Any thread; nothing here waits for a disk or the store.
 #pragma once
 

@@ -97,7 +97,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         entry->second.worker->SetRequest(request);
     }
     if (entries_.size() > cameras) {
-        rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its number
+        rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its id
     }
     ReconcileMounts(catalog);
     AnswerFlushes();

@@ -75,8 +75,8 @@ void Supervisor::DoEverySecond() {
     next_second_us_ = now_us + 1'000'000;
     const bool refreshed = common_config_.Refresh(false);
     if (refreshed != std::exchange(common_config_refreshed_, refreshed)) {
-        refreshed ? base::LogInfo("the common record is fresh again")
-                  : base::LogError("another process holds the common record's lock");
+        refreshed ? base::LogInfo("the recorder's heartbeat is refreshed again")
+                  : base::LogError("another process holds the lock of the recorder's heartbeat");
     }
     catalog_.Refresh();
     recordings_.DoEverySecond(Signals());

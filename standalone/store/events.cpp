@@ -28,7 +28,7 @@ void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
 void RequireEvent(const Event& event) {
     RequireSpan(event.start_s, event.end_s);
     if (event.camera_id < 1 || event.mount_id < 1 || event.frame_count < 0 || event.size_bytes < 0) {
-        throw InvalidRecord("an event has a camera and a mount, and no number below 0");
+        throw InvalidRecord("an event needs a camera and a mount, and no id below 0");
     }
     if (!IsPlainText(event.path, kMaxPathBytes) || !IsPlainText(event.audio_codec, kMaxCodecBytes)) {
         throw InvalidRecord("an event's path and codec are UTF-8 without control characters");

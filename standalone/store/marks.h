@@ -36,7 +36,7 @@ constexpr std::int64_t kMaxMarkSeconds = 3600;
 constexpr std::size_t kMaxMarkTextBytes = 8192;
 constexpr int kMarksPerDay = 5000;  // of an account, unless the setting marks_per_day says otherwise
 
-// Whose word a mark is: an account of the web API, or the command line, which has no number.
+// Whose word a mark is: an account of the web API, or the command line, which has no id.
 struct Reporter {
     int user_id = 0;
     std::string name;

@@ -42,7 +42,7 @@ class Mounts {
     // The first part of that: removes the rows, and leaves the mount. Throws as Remove does then.
     void ForgetEvents(int id);
 
-    // Keeps later cameras and events from getting numbers that footage on a mount has already: raises the counters to
+    // Keeps later cameras and events from getting ids that footage on a mount has already: raises the counters to
     // these where they are below.
     void ReserveIds(int camera, int event);
 

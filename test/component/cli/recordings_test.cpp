@@ -208,7 +208,7 @@ TEST_F(RecordingsTest, ARecordingIsTakenInExportedAndMissedWhenItIsGone) {
     broken.id = store::Mounts(store).Add(broken);
     Play({{"verify", 1, "verify --repair"},
           {"event show " + number, 66, "no event"},
-          {"verify --repair", 1, "adopted"},
+          {"verify --repair", 1, "imported"},
           {"verify --repair", 1, "was left alone: "}});
     store::Mounts(store).Remove(broken.id, true);
     {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What viewers and recorder tell each other beside the rings: requests for streams, and the common record.
+// What viewers and recorder tell each other beside the rings: requests for streams, and the recorder's heartbeat.
 #include <chrono>
 #include <fstream>
 #include <thread>

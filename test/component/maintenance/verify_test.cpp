@@ -130,7 +130,7 @@ TEST_F(VerifyTest, FindsAndRepairsEachKindOfDamage) {
          "closed", kFrames},
         {"an open row", [&] { change_row([](store::Event& event) { event.recording = true; }); }, "does not say",
          "closed", kFrames},
-        {"no row", [&] { events.Remove(std::array{event_}); }, "no event has the file", "adopted", kFrames},
+        {"no row", [&] { events.Remove(std::array{event_}); }, "no event has the file", "imported", kFrames},
         {"a row that leads away", [&] { change_row([](store::Event& event) { event.path = "../../etc/passwd"; }); },
          "names no recording", "removed the event", kFrames},
         {"a lonely index", [&] { fs::copy(Index(), day / "130000-1.index"); }, "no recording to", "removed", kFrames},
@@ -184,7 +184,7 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     const fs::path foreign = file_.parent_path() / "130000-4711.mkv";
     fs::copy(file_, foreign);
     Age();
-    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("adopted"));
+    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("imported"));
     EXPECT_FALSE(fs::exists(foreign));
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
     // A number that a restored store gave out anew, and one whose row a recorder may still have in memory.
@@ -201,11 +201,11 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     Age();
     const std::vector<Fault> faults = Verify(Records(), true).faults;
     ASSERT_EQ(faults.size(), 2U);
-    EXPECT_THAT(faults[0].done, HasSubstr("adopted"));
+    EXPECT_THAT(faults[0].done, HasSubstr("imported"));
     EXPECT_EQ(faults[1].done, "") << faults[1].problem;
     EXPECT_TRUE(fs::exists(in_reserve) && !fs::exists(taken) && !events.Find(reserved));
     lease.Release(1, "recorder");
-    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("adopted"));
+    EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("imported"));
     EXPECT_TRUE(fs::exists(in_reserve) && events.Find(reserved)) << "nobody else can have its number";
     EXPECT_TRUE(std::ranges::is_sorted(events.InRecordingOrder(footage_.MountId(), {}, 9), {}, &store::Event::start_s))
         << "a new number makes no recording younger";

@@ -24,12 +24,12 @@ store::Event RowOf(const archive::FileName& name, int mount_id, const archive::C
 std::string CloseEvent(store::Events& events, const MountFolder& mount, const store::Event& row);
 
 // Gives a recording without a row one, or removes a file that never got as far as its first frame. It keeps its own id
-// when that is below keep_below, from where on the store may still give out ids, and no other event has it: a store
-// that was restored from a backup gives out ids anew. Else it gets new_id, from Events::NextId after the file was seen,
+// when that is below keep_below, from where on the store may still assign ids, and no other event has it: a store
+// that was restored from a backup assigns ids again. Else it gets new_id, from Events::NextId after the file was seen,
 // and the place in the order of recording that its date says. A file that is no recording of ours is left alone, which
 // the sentence says. Throws as CloseEvent.
-std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int new_id, int keep_below);
+std::string ImportRecording(store::Events& events, const MountFolder& mount, int mount_id,
+                            const archive::FileName& name, int new_id, int keep_below);
 
 // Whether the row is that of this recording.
 bool IsRowOf(const std::optional<store::Event>& row, const archive::FileName& name);

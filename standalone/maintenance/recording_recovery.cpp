@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/maintenance/salvage.h"
+#include "standalone/maintenance/recording_recovery.h"
 
 #include <algorithm>
 #include <array>
@@ -83,8 +83,8 @@ std::string CloseEvent(store::Events& events, const MountFolder& mount, const st
     return "closed " + path.string() + " after its last good frame";
 }
 
-std::string AdoptRecording(store::Events& events, const MountFolder& mount, int mount_id, const archive::FileName& name,
-                           int new_id, int keep_below) {
+std::string ImportRecording(store::Events& events, const MountFolder& mount, int mount_id,
+                            const archive::FileName& name, int new_id, int keep_below) {
     const archive::Contents contents = archive::CloseCrashed(mount.Path() / archive::PathOf(name));
     const std::optional<store::Event> present = events.Find(name.event);
     const std::optional<std::string> pending = events.PathPendingDeletion(name.event);
@@ -96,7 +96,7 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
     }
     if (!present && !pending && name.event < keep_below) {
         events.Begin(RowOf(name, mount_id, contents));
-        return "adopted " + (mount.Path() / archive::PathOf(name)).string();
+        return "imported " + (mount.Path() / archive::PathOf(name)).string();
     }
     archive::FileName renamed = name;
     renamed.event = new_id;
@@ -106,7 +106,7 @@ std::string AdoptRecording(store::Events& events, const MountFolder& mount, int 
     store::Event row = RowOf(renamed, mount_id, contents);
     row.order = events.OrderForDate(mount_id, row.start_s);
     events.Begin(row);
-    return "adopted " + (mount.Path() / row.path).string();
+    return "imported " + (mount.Path() / row.path).string();
 }
 
 bool IsRowOf(const std::optional<store::Event>& row, const archive::FileName& name) {
