@@ -2,32 +2,37 @@
 //
 // Starts the web client. Where things are:
 //
-//   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers camera_setup,
-//              groups, emap_setup, devices, accounts, mounts, system, audit), the parts of an endless answer (multipart), files that are
-//              sent (upload), requests that end in time (deadline) and take turns (semaphore)
-//   live/      what is reported, as it is (alert_watch); live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept running by a
-//              feed, watched by signal_state, shared out by stream_budget. video_player and audio_player decode compressed
-//              streams, av_clock keeps them in sync. unplayable: why a stream cannot be played in this browser.
-//   playback/  recordings: what is known of them (footage_cache, footage_lookup, recorded_days); a player plays one,
-//              sync_playback those of several cameras (tracks) by one playback_clock; scrub_stills are the pictures of a
-//              playhead that is dragged
+//   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers
+//              camera_setup, groups, emap_setup, devices, hosts, accounts, mounts, system, audit), why cameras send
+//              nothing (signal_losses), the parts of an endless answer (multipart), files that are sent (upload),
+//              requests that end in time (deadline) and take turns (semaphore), cancellable waits (delay), what the
+//              page came over (protocol)
+//   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept
+//              running by a feed, watched by signal_state, shared out by stream_budget. video_player (with frame_gate)
+//              and audio_player (with jitter_buffer) decode compressed streams, av_clock keeps them in sync.
+//              unplayable: why a stream cannot be played in this browser. alert_watch: alerts, as they are reported
+//   playback/  recordings: what is known of them (footage_cache, footage_lookup, coverage, recorded_days), fetched a
+//              few requests at a time (request_queue); a player plays one (player_state, frame_stream, still_reader),
+//              sync_playback those of several cameras (tracks) by one playback_clock; scrub_stills are the pictures of
+//              a playhead that is dragged; event_walk: the events before and after
 //   ui/        app goes from screen to screen
-//     screens/    what fills the window: log-in, first account (setup), wall, events, maps, settings; what they have in common
-//                 (screen), and their addresses (route)
+//     screens/    what fills the window: login, first account (setup), wall, events, maps, settings; what they have in
+//                 common (screen), and their addresses (route)
 //     wall/       the grid of tiles and its layouts
 //     camera/     one camera live: its picture, the large view, snapshots
 //     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events
 //     timeline/   the lanes of recordings
 //     map/        e-maps and their editor
-//     settings/   the sections of the settings: cameras and their groups, maps and devices, accounts, storage, system,
-//                 audit. Most have a list and a page of one record (record_page), whose form (record_form) notices what others have changed
-//                 meanwhile (merge, conflict_panel)
-//     widgets/    what all of these use: elements, buttons, icons, fields, credentials, dialogs, texts, titles, notices, keys,
-//                 panning and zooming
-//   style/     base and components are for all, screen for the bar of each screen; every other file is for what its name says
+//     settings/   the sections of the settings: cameras and their groups, maps and devices, accounts, hosts, storage,
+//                 system, audit. Most have a list and a page of one record (record_page), whose form (record_form)
+//                 notices what others have changed meanwhile (merge, conflict_panel), as do dialogs (seen)
+//     widgets/    what all of these use: elements, buttons, icons, fields, credentials, dialogs, texts, titles,
+//                 notices, keys, panning and zooming
+//   style/     base and components are for all, screen for the bar of each screen; every other file is for what its
+//              name says
 //
-// ui may use live, playback and wire; live and playback use wire. Nothing here writes markup from text (see dom), and the page
-// needs neither inline styles nor scripts, so that a content security policy of 'self' holds.
+// ui may use live, playback and wire; live and playback use wire. Nothing here writes markup from text (see dom), and
+// the page needs neither inline styles nor scripts, so that a content security policy of 'self' holds.
 
 import "./style/base.css";
 import "./style/components.css";

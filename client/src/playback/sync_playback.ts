@@ -29,7 +29,7 @@ export class SyncPlayback {
   #isScrubbed = false;
   #isAdvancing = false;
   /** Counts how often the user went elsewhere. */
-  #place = 0;
+  #generation = 0;
   /** When a track was last brought to the playhead, and where the playhead was. */
   readonly #joined = new WeakMap<Track, { clockMs: number; atMs: number }>();
 
@@ -185,7 +185,7 @@ export class SyncPlayback {
   }
 
   #goTo(atMs: number, isPlaying: boolean): void {
-    this.#place += 1;
+    this.#generation += 1;
     this.#isScrubbed = false;
     this.#playheadMs = atMs;
     this.#isPlaying = isPlaying;
@@ -254,7 +254,7 @@ export class SyncPlayback {
     if (this.#isAdvancing) return;
     this.#isAdvancing = true;
     try {
-      const [place, fromMs, ended] = [this.#place, this.#tracks.clock.atMs, this.#tracks.ended];
+      const [generation, fromMs, ended] = [this.#generation, this.#tracks.clock.atMs, this.#tracks.ended];
       const ends = ended.map(({ stop }) => stop).filter((stop) => stop * 1000 <= fromMs + kEndToleranceMs);
       const fromS = Math.max(fromMs / 1000, ...ends);
       const current = this.#lead?.player.footage ?? ended[0] ?? null;
@@ -262,7 +262,7 @@ export class SyncPlayback {
       const isMark = current !== null && current.kind !== "event";
       const next = isMark ? null : await this.#lookup.next(this.#tracks.cameras, fromS, current);
       // Meanwhile the user may have gone elsewhere.
-      if (!this.#isPlaying || this.#tracks.hasActive || this.#place !== place) return;
+      if (!this.#isPlaying || this.#tracks.hasActive || this.#generation !== generation) return;
       if (!next) return otherwise();
       if (next.start - fromS > kMaxGapS && ended.length > 0) this.#skipped(next.start - fromS);
       this.open(next, Math.max(next.start, fromS) * 1000);

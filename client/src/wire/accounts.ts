@@ -2,7 +2,7 @@
 //
 // Accounts, their rights and sessions. All but the change of one's own password is for managers only.
 
-import type { Named } from "./camera_setup";
+import type { Named, RecordKey } from "./camera_setup";
 import type { Server } from "./server";
 
 export const kPrivileges = ["viewer", "manager", "owner"] as const;
@@ -89,7 +89,7 @@ export class Accounts {
     return (await this.#call<{ user: UserRecord }>("Set", { id, revision, ...changes })).user;
   }
 
-  remove({ id, revision }: Pick<UserRecord, "id" | "revision">, reauth: string): Promise<unknown> {
+  remove({ id, revision }: RecordKey, reauth: string): Promise<unknown> {
     return this.#call("Remove", { id, revision, reauth });
   }
 

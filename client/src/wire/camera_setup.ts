@@ -9,6 +9,12 @@ export interface Named {
   name: string;
 }
 
+/** A record as the user has seen it: rejected where someone else has changed it since. */
+export interface RecordKey {
+  id: number;
+  revision: number;
+}
+
 export interface CameraSource {
   /** 0 high, 1 low, 2 mobile. */
   profile: number;
@@ -140,7 +146,7 @@ export class CameraSetup {
     return (await this.#call<{ camera: CameraRecord }>("Set", { id, revision, ...changes })).camera;
   }
 
-  remove({ id, revision }: Pick<CameraRecord, "id" | "revision">, footage: "keep" | "remove"): Promise<unknown> {
+  remove({ id, revision }: RecordKey, footage: "keep" | "remove"): Promise<unknown> {
     return this.#call("Remove", { id, revision, footage });
   }
 

@@ -2,7 +2,7 @@
 //
 // Doors, I/O modules and POS terminals as managers set them up. All of it is for managers only.
 
-import type { Named } from "./camera_setup";
+import type { Named, RecordKey } from "./camera_setup";
 import type { Server } from "./server";
 
 export type DeviceKind = "door" | "io" | "pos";
@@ -34,7 +34,7 @@ export interface DeviceRecord extends DeviceSettings, Named {
 
 const kApi = "VEXO.Device";
 
-type Seen = Pick<DeviceRecord, "kind" | "id" | "revision">;
+type DeviceKey = Pick<DeviceRecord, "kind"> & RecordKey;
 
 /** What has a revision is rejected with status 409 and the record where that is stale. */
 export class Devices {
@@ -52,11 +52,11 @@ export class Devices {
     return this.#call("Add", { kind, ...settings });
   }
 
-  set({ kind, id, revision }: Seen, settings: DeviceSettings): Promise<unknown> {
+  set({ kind, id, revision }: DeviceKey, settings: DeviceSettings): Promise<unknown> {
     return this.#call("Set", { kind, id, revision, ...settings });
   }
 
-  remove({ kind, id, revision }: Seen): Promise<unknown> {
+  remove({ kind, id, revision }: DeviceKey): Promise<unknown> {
     return this.#call("Remove", { kind, id, revision });
   }
 

@@ -2,7 +2,7 @@
 //
 // E-maps as managers set them up, but for what is placed on them (emaps). All of it is for managers only.
 
-import type { Named } from "./camera_setup";
+import type { Named, RecordKey } from "./camera_setup";
 import type { Server } from "./server";
 import type { UploadOptions } from "./upload";
 
@@ -22,8 +22,6 @@ export const kMaxUploadBytes = 20 * 2 ** 20;
 
 const kApi = "VEXO.Emap";
 
-type Seen = Pick<EmapRecord, "id" | "revision">;
-
 /** What has a revision is rejected with status 409 and the record where that is stale. */
 export class EmapSetup {
   readonly #server: Server;
@@ -41,16 +39,16 @@ export class EmapSetup {
     return (await this.#server.upload<{ emap: EmapRecord }>(kApi, "Add", { name }, picture, options)).emap;
   }
 
-  async replacePicture({ id, revision }: Seen, picture: Blob, options: UploadOptions): Promise<EmapRecord> {
+  async replacePicture({ id, revision }: RecordKey, picture: Blob, options: UploadOptions): Promise<EmapRecord> {
     const of = { emap: String(id), revision: String(revision) };
     return (await this.#server.upload<{ emap: EmapRecord }>(kApi, "Picture", of, picture, options)).emap;
   }
 
-  rename({ id, revision }: Seen, name: string): Promise<unknown> {
+  rename({ id, revision }: RecordKey, name: string): Promise<unknown> {
     return this.#server.call(kApi, "Rename", {}, { json: { emap: id, revision, name } });
   }
 
-  remove({ id, revision }: Seen): Promise<unknown> {
+  remove({ id, revision }: RecordKey): Promise<unknown> {
     return this.#server.call(kApi, "Remove", {}, { json: { emap: id, revision } });
   }
 }

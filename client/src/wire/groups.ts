@@ -2,7 +2,7 @@
 //
 // Camera groups as managers set them up. All of it is for managers only.
 
-import type { Named } from "./camera_setup";
+import type { Named, RecordKey } from "./camera_setup";
 import type { Server } from "./server";
 
 /** What a manager may change. */
@@ -40,7 +40,7 @@ export class Groups {
     return (await this.#call<{ group: GroupRecord }>("Set", { id, revision, ...changes })).group;
   }
 
-  remove({ id, revision }: Pick<GroupRecord, "id" | "revision">): Promise<unknown> {
+  remove({ id, revision }: RecordKey): Promise<unknown> {
     return this.#call("Remove", { id, revision });
   }
 

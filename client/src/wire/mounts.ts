@@ -2,6 +2,7 @@
 //
 // Mounts: where recordings are kept, how much of it is used, and for how long it lasts. For managers only.
 
+import type { RecordKey } from "./camera_setup";
 import type { Server } from "./server";
 
 /** What a manager may change. */
@@ -77,7 +78,7 @@ export class Mounts {
     return this.#call("Set", { id, revision, ...changes, confirm });
   }
 
-  remove({ id, revision }: Pick<MountRecord, "id" | "revision">): Promise<unknown> {
+  remove({ id, revision }: RecordKey): Promise<unknown> {
     return this.#call("Remove", { id, revision });
   }
 

@@ -39,7 +39,7 @@ export interface FrameStart {
 }
 
 /** A place in the order of events, and which events are looked for from there. */
-export interface EventPlace {
+export interface EventCursor {
   cameras: readonly number[];
   kinds: readonly EventKind[];
   /** Unix seconds. */
@@ -177,7 +177,7 @@ export class Recordings {
   }
 
   /** What can be played behind the place, or before it; null where there is nothing. */
-  async next({ cameras, kinds, atS, id }: EventPlace, isBefore: boolean): Promise<Footage | null> {
+  async next({ cameras, kinds, atS, id }: EventCursor, isBefore: boolean): Promise<Footage | null> {
     type RawNext = RawMark | (RawEvent & { kind: "event"; camera_id: number });
     const { event } = await this.#server.call<{ event: RawNext | null }>("VEXO.Event", "Next", {
       cameralists: cameras.join(),

@@ -28,7 +28,7 @@ const kKinds = ["event", "alert", "pos"] as const;
 const kIds = /^\d+(,\d+)*$/;
 
 /** Null for an address of another screen. */
-export function parsePlace(hash: string): EventsAddress | null {
+export function parseEventsAddress(hash: string): EventsAddress | null {
   const said = new URLSearchParams(hash.replace(/^#/, ""));
   const number = (name: string) => (/^\d{1,15}$/.test(said.get(name) ?? "") ? Number(said.get(name)) : null);
   const ids = (name: string) => (kIds.test(said.get(name) ?? "") ? said.get(name)!.split(",").map(Number) : null);
@@ -52,7 +52,7 @@ export function parsePlace(hash: string): EventsAddress | null {
   };
 }
 
-export function formatPlace({ footage, atMs, stage, filter }: EventsAddress): string {
+export function formatEventsAddress({ footage, atMs, stage, filter }: EventsAddress): string {
   const parts = [footage ? `#${footage.kind}=${footage.id}` : "#events"];
   // Not rounded down, which would lead to the frame before.
   if (atMs !== null) parts.push(`at=${Math.ceil(atMs)}`);
@@ -72,8 +72,8 @@ function moreOf({ kinds, isKeptOnly, words }: ListChoice): string[] {
  * Writes what is shown into the address: as an entry of its own in the history, to which Back leads, or in place of the
  * one before, which it does once in the interval: call it again until the address has it.
  */
-export function recordPlace(place: EventsAddress, isNewEntry: boolean, intervalMs: number): void {
-  const before = parsePlace(location.hash);
+export function recordEventsAddress(address: EventsAddress, isNewEntry: boolean, intervalMs: number): void {
+  const before = parseEventsAddress(location.hash);
   const isFirst = before !== null && before.footage === null && before.atMs === null;
-  recordAddress(formatPlace(place), isNewEntry || isFirst, intervalMs);
+  recordAddress(formatEventsAddress(address), isNewEntry || isFirst, intervalMs);
 }

@@ -9,7 +9,7 @@ import { SyncPlayback } from "../../playback/sync_playback";
 import { Exports } from "../../wire/exports";
 import { isSameFootage, type Footage } from "../../wire/footage";
 import { protocol } from "../../wire/protocol";
-import { Recordings, type EventPlace } from "../../wire/recordings";
+import { Recordings, type EventCursor } from "../../wire/recordings";
 import { asServerError } from "../../wire/server";
 import { EventsJumps } from "../events/events_jumps";
 import { kEventsKeys, pressEventsKey, type EventsActions } from "../events/events_keys";
@@ -28,7 +28,7 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { OncePerFrame } from "../widgets/once_per_frame";
 import { spanInWords } from "../widgets/text";
-import { parsePlace, recordPlace, type EventsAddress } from "./events_route";
+import { parseEventsAddress, recordEventsAddress, type EventsAddress } from "./events_route";
 import { keepTrying } from "./keep_trying";
 import { showCamera } from "./route";
 import { Screen } from "./screen";
@@ -64,7 +64,7 @@ export class EventsScreen extends Screen {
     () => this.#showing.request(),
     (seconds) => notify(`Skipped ${spanInWords(seconds)} without recordings.`),
   );
-  readonly #walk = new EventWalk(this.#recordings, () => this.#place(), () => this.#showing.request());
+  readonly #walk = new EventWalk(this.#recordings, () => this.#cursor(), () => this.#showing.request());
   readonly #export = new ExportPanel(this.#exports, (span) => this.#overview.timeline.chooseSpan(span));
   readonly #stage: Stage;
   readonly #picker: StagePicker;
@@ -185,12 +185,12 @@ export class EventsScreen extends Screen {
 
   /** Opens what the address names, unless it is being shown. */
   async #openRoute(): Promise<void> {
-    const place = parsePlace(location.hash);
-    if (!place) return;
+    const address = parseEventsAddress(location.hash);
+    if (!address) return;
     const followed = (this.#followed += 1);
     this.#isFollowing = true;
     try {
-      await this.#openPlace(place, () => followed === this.#followed);
+      await this.#openAddress(address, () => followed === this.#followed);
     } catch (error) {
       notify(asServerError(error).message);
     } finally {
@@ -198,7 +198,7 @@ export class EventsScreen extends Screen {
     }
   }
 
-  async #openPlace({ footage: wanted, atMs, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
+  async #openAddress({ footage: wanted, atMs, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
     if (filter) this.#overview.follow(filter);
     if (stage) this.#stage.show(stage.plan, stage.large);
     // Back from what is being played ends it.
@@ -245,8 +245,8 @@ export class EventsScreen extends Screen {
     if (playheadMs === null || isScrubbed || this.#isFollowing) return;
     const { plan, large } = this.#stage;
     const footage = lead?.player.footage ?? null;
-    const place = { footage, atMs: playheadMs, stage: { plan, large }, filter: this.#overview.choice };
-    recordPlace(place, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
+    const address = { footage, atMs: playheadMs, stage: { plan, large }, filter: this.#overview.choice };
+    recordEventsAddress(address, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
     this.#isNewEntry = false;
   }
 
@@ -267,7 +267,7 @@ export class EventsScreen extends Screen {
   }
 
   /** Where the walk through the events is, and which it stops at. */
-  #place(): EventPlace | null {
+  #cursor(): EventCursor | null {
     const { filter } = this.#overview;
     const cameras = filter.cameras.map(({ id }) => id);
     if (cameras.length === 0) return null;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 
-import { formatPlace, parsePlace, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
+import { formatEventsAddress, parseEventsAddress, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
 
 describe("an address of the events' screen", () => {
   const all = ["continuous", "alarm", "alert", "pos"] as const;
@@ -24,13 +24,13 @@ describe("an address of the events' screen", () => {
       "#pos=9&filter=3&text=2+Tea+%26+%E2%82%AC+%2B5%25",
       { ...nothing, footage: { kind: "pos", id: 9 }, filter: { cameras: [3], kinds: [...all], isKeptOnly: false, words: "2 Tea & € +5%" } },
     ],
-  ])("%s", (hash, place) => {
-    expect(parsePlace(hash)).toEqual(place);
-    expect(formatPlace(place)).toBe(hash);
+  ])("%s", (hash, address) => {
+    expect(parseEventsAddress(hash)).toEqual(address);
+    expect(formatEventsAddress(address)).toBe(hash);
   });
 
   test.each(["", "#camera=5", "#eventsx", "#event=x", "#event=", "#maps"])("%j is none", (hash) => {
-    expect(parsePlace(hash)).toBeNull();
+    expect(parseEventsAddress(hash)).toBeNull();
   });
 
   test.each([
@@ -39,10 +39,10 @@ describe("an address of the events' screen", () => {
     ["#event=7&layout=2&cameras=-1", null],
     ["#event=7&layout=2", null],
   ])("%s leaves the stage as it is", (hash, stage) => {
-    expect(parsePlace(hash)).toMatchObject({ footage: { id: 7 }, stage });
+    expect(parseEventsAddress(hash)).toMatchObject({ footage: { id: 7 }, stage });
   });
 
   test("leads to the frame that is shown, not to the one before", () => {
-    expect(formatPlace({ ...nothing, atMs: 1000.2 })).toBe("#events&at=1001");
+    expect(formatEventsAddress({ ...nothing, atMs: 1000.2 })).toBe("#events&at=1001");
   });
 });
