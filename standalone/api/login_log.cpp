@@ -18,7 +18,8 @@ namespace {
 
 constexpr std::size_t kMaxAccountBytes = 64;  // no account's name is longer
 
-// In quotes, so that a text cannot pass for more than it is, and in printable ASCII, so that it injects no terminal control sequences.
+// In quotes, so that a text cannot pass for more than it is, and in printable ASCII, so that it injects no terminal
+// control sequences.
 std::string Quoted(std::string_view text) {
     std::string quoted = Json::valueToQuotedString(std::string(text.substr(0, kMaxAccountBytes)).c_str());
     std::replace(quoted.begin(), quoted.end(), '\x7f', ' ');

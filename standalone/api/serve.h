@@ -35,8 +35,8 @@ void PrepareProcess(const base::Installation& installation);
 // exact: who disguises the name sees old ones.
 bool NeedsCounters(const http::Request& request);
 
-// Whether the request may be one of log-in, setting up or log-out. Not exact, and need not be: the web server lets through
-// few POSTs that name this api.
+// Whether the request may be one of log-in, setting up or log-out. Not exact, and need not be: the web server lets
+// through few POSTs that name this api.
 bool MayBeLogIn(const http::Request& request);
 
 // For a request without a session whose body holds more than kMaxBodyWithoutSession.

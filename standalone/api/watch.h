@@ -9,8 +9,8 @@
 
 namespace lookhaven::api {
 
-// Sends the stream, and returns an empty answer when it has ended. Throws Failure 400 for a place that is none, 503 where
-// the caller has too many watches.
+// Sends the stream, and returns an empty answer when it has ended. Throws Failure 400 for a place that is none, 503
+// where the caller has too many watches.
 std::string Watch(const Call& call);
 
 }  // namespace lookhaven::api

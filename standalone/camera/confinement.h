@@ -5,8 +5,8 @@
 // Why so        See docs/design/cameras.md.
 // Invariants    Afterwards the process can (1) read no files but those that resolve names and public certificates, (2)
 //               start no process or program, reach no other process's memory and signal none, (3) attach no shared
-//               memory, (4) open no sockets but those to TCP and UDP, and listen on none, (5) execute no memory that was not
-//               executable before. None of it can be taken back.
+//               memory, (4) open no sockets but those to TCP and UDP, and listen on none, (5) execute no memory that
+//               was not executable before. None of it can be taken back.
 #pragma once
 
 namespace lookhaven::camera {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder's heartbeat, the platform's common configuration, which every stream looks at: is the recorder alive, should streams pause?
+// The recorder's heartbeat, the platform's common configuration, which every stream looks at: is the recorder alive,
+// should streams pause?
 //
 // Why so        Readers lock the record, and any of them may be killed while it holds the lock: the mutex is robust.
 //               The record lies in a mapped file that is replaced only after a reboot, since a mutex that was held when

@@ -22,8 +22,8 @@ constexpr std::size_t kMaxPictureBytes = 16U << 20U;
 // "png", "jpg", "webp" or "svg"; empty for anything else. An SVG that declares entities is nothing of these.
 std::string_view PictureType(std::string_view bytes);
 
-// Whether a file in that folder may have the name: "<digits>-<16 hex digits>.<type>". The digits are the second in which it
-// was written.
+// Whether a file in that folder may have the name: "<digits>-<16 hex digits>.<type>". The digits are the second in
+// which it was written.
 bool IsPictureName(std::string_view name);
 
 class Pictures {

@@ -38,8 +38,8 @@ struct RecordingPlan {
     friend bool operator==(const RecordingPlan&, const RecordingPlan&) = default;
 };
 
-// What holds for a camera without a plan of its own: it is recorded around its marks, but not before them, for which its
-// stream would have to run all the time.
+// What holds for a camera without a plan of its own: it is recorded around its marks, but not before them, for which
+// its stream would have to run all the time.
 inline RecordingPlan NoPlan() {
     return {.pre_s = 0};
 }
