@@ -81,7 +81,7 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     admin::RequireFreeFolder(store, mount.path, 0, false);
     mount.id = mounts.Add(mount);
     admin::MarkFolder(store, mount);
-    admin::ReserveNumbers(store, mount);
+    admin::ReserveIds(store, mount);
     return true;
 }
 
