@@ -21,6 +21,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/futex.h"
 #include "standalone/base/json_text.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
 
@@ -93,15 +94,34 @@ std::string EventText(const char* name, const Place& place, const Json::Value& d
     return std::string("event: ") + name + "\nid: " + place.Text() + "\ndata: " + base::OneLineJson(data) + "\n\n";
 }
 
+// Whether the caller can have been told of that mark: one that it may see, or one before such a one. A mark of nobody's
+// knowledge is of a store that was restored since; and of what is hidden the answer tells nothing.
+bool MayHaveSeen(store::Marks& marks, int id, int newest_visible) {
+    if (id <= newest_visible) {
+        return true;
+    }
+    return std::ranges::any_of(store::MarkKindNames(), [&](const auto& kind) {
+        const auto mark = marks.Find(kind.second, id);
+        return mark && IsVisible(*mark);
+    });
+}
+
 bool Send(const Call& call, std::string text) {
     iovec piece{text.data(), text.size()};
     return call.context.output()->Send({&piece, 1});
 }
 
-// The first event, and the mark behind which those follow that are to be told.
+using Clock = std::chrono::steady_clock;
+
+struct Progress {
+    Place place;     // of the last event
+    int cursor = 0;  // the mark behind which those follow that are to be told
+    Clock::time_point sent = Clock::now();
+};
+
 struct Start {
     std::string event;
-    int cursor = 0;
+    Progress progress;
 };
 
 Start StartOf(const Call& call) {
@@ -109,43 +129,55 @@ Start StartOf(const Call& call) {
     const std::int64_t since_s = now_s - kMaxAwaySeconds;
     store::Marks marks(call.Records());
     const std::optional<Place> asked = PlaceOf(call);
-    Backlog backlog;
-    // A store that was restored from a backup gives the ids of lost marks once more.
-    bool is_resumed = asked && asked->told_s > since_s && asked->told_s <= now_s + 60 && asked->mark <= marks.LastId();
+    Backlog backlog = LookBack(marks, 0, 0, since_s);
+    backlog.missed = 0;
+    bool is_resumed = asked && asked->told_s > since_s && asked->told_s <= now_s + 60 &&
+                      MayHaveSeen(marks, asked->mark, backlog.newest);
     if (is_resumed) {
-        backlog = LookBack(marks, asked->mark, kMaxMissed, since_s);
-        is_resumed = backlog.missed <= kMaxMissed;
-    }
-    if (!is_resumed) {
-        backlog = LookBack(marks, 0, 0, since_s);
-        backlog.missed = 0;
+        const Backlog missed = LookBack(marks, asked->mark, kMaxMissed, since_s);
+        is_resumed = missed.missed <= kMaxMissed;
+        backlog = is_resumed ? missed : backlog;
     }
     Json::Value data;
     data["resumed"] = is_resumed;
     data["missed"] = backlog.missed;
     data["time"] = Json::Int64{now_s};
     const Place place{is_resumed ? asked->mark : backlog.newest, now_s};
-    return {EventText("start", place, data), backlog.missed > 0 ? backlog.oldest - 1 : backlog.last};
+    return {EventText("start", place, data), {place, backlog.missed > 0 ? backlog.oldest - 1 : backlog.last}};
 }
 
-// Tells what was reported behind that mark; returns the last one.
-int TellReported(const Call& call, int cursor) {
+// Tells what was reported since.
+void TellReported(const Call& call, Progress& progress) {
     for (bool is_all = false; !is_all && !call.slot.MustEnd();) {
         std::string text;
-        const std::vector<store::Mark> reported = store::Marks(call.Records()).ReportedAfter(cursor, kMarksPage);
+        const std::vector<store::Mark> reported =
+            store::Marks(call.Records()).ReportedAfter(progress.cursor, kMarksPage);
         for (const store::Mark& mark : reported) {
-            cursor = mark.id;
+            progress.cursor = mark.id;
             if (IsVisible(mark)) {
-                text += EventText("mark", {mark.id, base::WallSeconds()}, Describe(mark));
+                progress.place = {mark.id, base::WallSeconds()};
+                text += EventText("mark", progress.place, Describe(mark));
             }
         }
         is_all = reported.size() < kMarksPage;
         call.context.CloseRecords();
-        if (!text.empty() && !Send(call, std::move(text))) {
-            return cursor;
+        if (!text.empty()) {
+            progress.sent = Clock::now();
+            if (!Send(call, std::move(text))) {
+                return;
+            }
         }
     }
-    return cursor;
+}
+
+// Due by what was sent alone: what else wakes a watch may be hidden from its caller.
+void TellAlive(const Call& call, Progress& progress) {
+    if (Clock::now() - progress.sent < kHeartbeat) {
+        return;
+    }
+    progress.place.told_s = base::WallSeconds();
+    progress.sent = Clock::now();
+    Send(call, EventText("alive", progress.place, Json::objectValue));
 }
 
 }  // namespace
@@ -153,7 +185,7 @@ int TellReported(const Call& call, int cursor) {
 std::string Watch(const Call& call) {
     const std::atomic<std::uint32_t>& reports = call.slots.Reports();
     std::uint32_t seen = reports;
-    auto [event, cursor] = StartOf(call);
+    auto [event, progress] = StartOf(call);
     if (!call.slots.BeginWatch(call.slot, kMaxWatchesOfUser)) {
         throw Failure(503, "this account watches for events in too many places", http::kRetrySoonSeconds);
     }
@@ -161,11 +193,10 @@ std::string Watch(const Call& call) {
     call.context.CloseRecords();
     Send(call, "Status: 200 OK\r\nContent-Type: text/event-stream\r\nCache-Control: no-store\r\n\r\n" + event);
     while (!call.context.output()->IsBroken() && !call.slot.MustEnd()) {
-        cursor = TellReported(call, cursor);
-        base::SleepWhile(reports, seen, kHeartbeat);
-        if (reports == seen) {
-            Send(call, ":\n\n");
-        }
+        TellReported(call, progress);
+        TellAlive(call, progress);
+        const auto rest = progress.sent + kHeartbeat - Clock::now();
+        base::SleepWhile(reports, seen, std::chrono::ceil<std::chrono::microseconds>(rest));
         seen = reports;
     }
     return "";

@@ -191,11 +191,6 @@ int Marks::NewestId() {
     return connection_.FetchOne<int>("select id from marks order by id desc limit 1").value_or(0);
 }
 
-int Marks::LastId() {
-    return static_cast<int>(
-        connection_.FetchOne<std::int64_t>("select value from counters where name = 'event'").value());
-}
-
 std::vector<Mark> Marks::Pending() {
     return connection_.FetchAll<Mark>("where state = 0 order by end_s");
 }

@@ -119,8 +119,6 @@ class Marks {
     std::vector<Report> ReportsBetween(int after, int before, int limit);
     // The largest id of a mark; 0 for none. Costs next to nothing.
     int NewestId();
-    // The largest id that was ever given to a mark or a recorded event.
-    int LastId();
     // What the recorder has to save, by the end of the span. Costs nothing when there is none.
     std::vector<Mark> Pending();
     // Marks of the camera whose footage ended at or before that time, by start and id, without demo and pending ones:

@@ -121,7 +121,9 @@ TEST_F(WatchApi, GoesOnWhereTheClientWasWithoutLossOrRepetition) {
     }
     EXPECT_EQ(first.Texts(2), "a b ");
     const std::string told = first.Place();
-    Report(3, "hidden");
+    const int hidden = Report(3, "hidden");
+    EXPECT_FALSE(Watcher(host_, viewer_, std::to_string(hidden) + '-' + std::to_string(now_s)).IsResumed())
+        << "as one that there is not";
     Report(1, "c");
     const std::string yesterday = std::to_string(now_s - 90'000);
     const std::string id = told.substr(0, told.find('-'));
