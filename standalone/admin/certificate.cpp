@@ -85,7 +85,7 @@ Json::Value ReplaceCertificate(store::Store& store, const base::Installation& in
     const remote::CertificatePair pair = Read(offer);
     // Whose browser goes meanwhile leaves no web server that was not told.
     const base::BlockedSignals whole;
-    const CertificateFolder folder(installation);
+    CertificateFolder folder(installation);
     const std::string known = folder.Certificates();
     const Json::Value before = RecordOf(known);
     const Json::Value after = CertificateRecord(pair.facts);

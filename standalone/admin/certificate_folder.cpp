@@ -8,6 +8,7 @@
 #include <unistd.h>
 
 #include "standalone/base/file.h"
+#include "standalone/base/log.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::admin {
@@ -34,8 +35,10 @@ CertificateFolder::CertificateFolder(const base::Installation& installation)
       lock_(base::LockFile(installation.RunFolder() / "certificate.lock")) {}
 
 CertificateFolder::~CertificateFolder() {
-    std::error_code ignored;
-    std::filesystem::remove_all(other_, ignored);
+    if (is_prepared_) {
+        std::error_code ignored;
+        std::filesystem::remove_all(other_, ignored);
+    }
 }
 
 std::string CertificateFolder::Certificates() const {
@@ -46,13 +49,18 @@ std::string CertificateFolder::Certificates() const {
     }
 }
 
-void CertificateFolder::Prepare(const std::string& certificates, const std::string& key) const {
+void CertificateFolder::Prepare(const std::string& certificates, const std::string& key) {
     namespace fs = std::filesystem;
     if (fs::is_symlink(used_)) {
         throw store::InvalidRecord("the folder " + used_.string() + " is a link: replace the files where it leads");
     }
     fs::create_directory(used_);
-    fs::remove_all(other_);  // of a process that died
+    if (fs::exists(other_)) {
+        // Of a process that died: it may be the last pair that the web server took.
+        fs::remove_all(home_ / "tls.before");
+        fs::rename(other_, home_ / "tls.before");
+    }
+    is_prepared_ = true;
     if (::mkdir(other_.c_str(), 0700) != 0) {
         base::ThrowErrno("cannot make " + other_.string());
     }
@@ -76,10 +84,14 @@ void CertificateFolder::Prepare(const std::string& certificates, const std::stri
 }
 
 void CertificateFolder::Exchange() const {
+    const base::FileDescriptor home = base::OpenFile(home_, O_RDONLY | O_DIRECTORY);
     if (::renameat2(AT_FDCWD, other_.c_str(), AT_FDCWD, used_.c_str(), RENAME_EXCHANGE) != 0) {
         base::ThrowErrno("cannot replace " + used_.string());
     }
-    Sync(home_);
+    if (::fsync(home.Get()) != 0) {
+        // They have changed places, which whoever calls must not take for undone.
+        base::LogError("cannot sync " + home_.string() + " after the certificate was replaced");
+    }
 }
 
 }  // namespace lookhaven::admin

@@ -21,7 +21,7 @@ class CertificateFolder {
   public:
     // Throws std::system_error, as each of these does.
     explicit CertificateFolder(const base::Installation& installation);
-    // Removes what is not in use.
+    // Removes what was prepared, or what it has replaced.
     ~CertificateFolder();
     CertificateFolder(const CertificateFolder&) = delete;
     CertificateFolder& operator=(const CertificateFolder&) = delete;
@@ -29,9 +29,11 @@ class CertificateFolder {
     // Empty where there is none that can be read.
     std::string Certificates() const;
     // Writes both, readable by the owner alone, to what is not in use. Throws store::InvalidRecord where the folder in
-    // use is a link or has folders in it, which are the owner's to take away.
-    void Prepare(const std::string& certificates, const std::string& key) const;
-    // What was prepared is in use, on the disk for good, and what was in use is not; the next call undoes that.
+    // use is a link or has folders in it, which are the owner's to take away. What a process that died has left becomes
+    // the folder tls.before.
+    void Prepare(const std::string& certificates, const std::string& key);
+    // What was prepared is in use, and what was in use is not; the next call undoes that. Where it throws, neither has
+    // happened.
     void Exchange() const;
 
   private:
@@ -39,6 +41,7 @@ class CertificateFolder {
     std::filesystem::path used_;
     std::filesystem::path other_;
     base::FileDescriptor lock_;
+    bool is_prepared_ = false;
 };
 
 }  // namespace lookhaven::admin

@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+#include <openssl/bn.h>
+#include <openssl/core_names.h>
 #include <openssl/err.h>
 #include <openssl/pem.h>
 #include <openssl/x509v3.h>
@@ -97,6 +99,22 @@ void RequireServer(const std::vector<Certificate>& chain, const std::string& pem
     CertificateName(pem);
 }
 
+bool IsFactor(const EVP_PKEY* key, const char* name) {
+    BIGNUM* factor = nullptr;
+    const bool has_it = EVP_PKEY_get_bn_param(key, name, &factor) == 1;
+    const bool is_one = has_it && BN_num_bits(factor) < EVP_PKEY_get_bits(key);
+    BN_clear_free(factor);
+    return is_one;
+}
+
+// Else whoever made it up decides how long it is examined for primes.
+bool HasUsableFactors(const EVP_PKEY* key) {
+    BIGNUM* third = nullptr;
+    const bool has_third = EVP_PKEY_get_bn_param(key, OSSL_PKEY_PARAM_RSA_FACTOR3, &third) == 1;
+    BN_clear_free(third);
+    return !has_third && IsFactor(key, OSSL_PKEY_PARAM_RSA_FACTOR1) && IsFactor(key, OSSL_PKEY_PARAM_RSA_FACTOR2);
+}
+
 bool IsUsableKind(const EVP_PKEY* key) {
     if (EVP_PKEY_is_a(key, "RSA") == 1) {
         return EVP_PKEY_get_bits(key) >= kMinRsaBits && EVP_PKEY_get_bits(key) <= kMaxRsaBits;
@@ -131,7 +149,8 @@ void RequireKeyOf(X509* certificate, EVP_PKEY* key) {
         throw InvalidCertificate("the key is that of another certificate");
     }
     const KeyContext context(EVP_PKEY_CTX_new(key, nullptr), EVP_PKEY_CTX_free);
-    if (!context || EVP_PKEY_pairwise_check(context.get()) != 1) {
+    if (!context || (EVP_PKEY_is_a(key, "RSA") == 1 && !HasUsableFactors(key)) ||
+        EVP_PKEY_pairwise_check(context.get()) != 1) {
         ERR_clear_error();
         throw InvalidCertificate("the key is damaged: its private half is of another key");
     }

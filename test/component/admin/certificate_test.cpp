@@ -227,7 +227,7 @@ TEST_P(CertificateTest, FitsItsKeyWheneverAProcessDies) {
     for (const auto& row : rows) {
         const pid_t child = ::fork();
         if (child == 0) {
-            const CertificateFolder folder(installation_);
+            CertificateFolder folder(installation_);
             folder.Prepare(File("other.pem"), File("other.key"));
             if (row.is_exchanged) {
                 folder.Exchange();
@@ -240,7 +240,10 @@ TEST_P(CertificateTest, FitsItsKeyWheneverAProcessDies) {
         EXPECT_TRUE(std::filesystem::exists(installation_.Home() / "tls.new"));
         EXPECT_EQ(OnDisk(), row.left);
     }
+    CertificateFolder(installation_).Certificates();  // whoever only looks deletes nothing
     Replace("rsa", manager_, is_away_);
+    EXPECT_EQ(base::ReadFile(installation_.Home() / "tls.before/key.pem"), File("ec.key"))
+        << "the last pair that a web server took";
     EXPECT_EQ(OnDisk(), "rsa");
     EXPECT_FALSE(std::filesystem::exists(installation_.Home() / "tls.new"));
 }
