@@ -99,7 +99,7 @@ std::string AcceptInvitation(store::Store& store, std::string_view secret, const
             store::Settings(store).Set(kInvitationSetting, "");
         });
     } catch (const Forbidden&) {
-        throw InvalidInvitation("the pairing code of an account that is no manager any more");
+        throw InvalidInvitation("the pairing code belongs to an account that is no longer a manager");
     }
     return shared;
 }

@@ -72,7 +72,7 @@ base::Installation Console::Installation() const {
     BecomeOwner();
     const std::string home = HomePath();
     if (::access(home.c_str(), F_OK) != 0) {
-        throw Failure(kNoInput, "there is not a state folder at ", home,
+        throw Failure(kNoInput, "there is no state folder at ", home,
                       ": create it with lookhaven init, or name another with --home");
     }
     if (::access(home.c_str(), R_OK | X_OK) == 0 && !base::IsStateFolder(home)) {

@@ -96,7 +96,7 @@ std::string HoursText(const std::string& hours) {
         });
         text += Concat(kDayNames.at(static_cast<std::size_t>(day)), "  ", line, "\n");
     }
-    return text + "# always, a on alarm, . never";
+    return text + "# always, a on alert, . never";
 }
 
 }  // namespace lookhaven::cli

@@ -33,7 +33,7 @@ void RequirePlan(const RecordingPlan& plan) {
     }
     if (!plan.hours.empty() &&
         (plan.hours.size() != base::kHoursOfWeek || plan.hours.find_first_not_of("012") != plan.hours.npos)) {
-        throw InvalidRecord("a schedule has 168 hours, each of them 0 (never), 1 (always) or 2 (on alarm)");
+        throw InvalidRecord("a schedule has 168 hours, each of them 0 (never), 1 (always) or 2 (on alert)");
     }
     if (!IsWithin(plan.segment_s, kMinSegmentSeconds, kMaxSegmentSeconds)) {
         throw InvalidRecord("a recording is cut into pieces of 10 to 3600 seconds");

@@ -42,7 +42,7 @@ struct Mapping<ServerDenial> {
 namespace {
 
 constexpr std::size_t kMaxCameraNameBytes = 255;
-constexpr std::size_t kMaxCertificateBytes = 16'384;
+constexpr std::size_t kMaxCertificateBytes = 32'768;  // as much as its web server is given with
 constexpr std::size_t kSecretDigits = 64;
 
 // Looks at the first and the last line; what stands between them is for the TLS library to judge.
@@ -58,7 +58,7 @@ void RequireValid(soci::session& sql, const RecordingServer& server) {
     }
     if (server.address.empty() != server.certificate.empty() ||
         (!server.certificate.empty() && !IsCertificate(server.certificate))) {
-        throw InvalidRecord("a server that has an address has a certificate in PEM, of up to 16384 bytes");
+        throw InvalidRecord("a server that has an address has a certificate in PEM, of up to 32768 bytes");
     }
     RequireFreeName(sql, "servers", "a server", server.id, server.name);
 }
