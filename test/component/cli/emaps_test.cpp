@@ -45,8 +45,8 @@ TEST_F(EmapsTest, MapsAreMadeFilledCarriedOverAndRemoved) {
           {"camera remove 4", 0, "Removed"},
           {"emap import " + out + " --name Again", 0, "1 items were left out"},
           {"emap show 4", 0, "emap", "camera"},
-          {"emap import " + File("broken", "{\"lookhaven_emap\":1,"), 65, "no e-map"},
-          {"emap import " + File("deep", std::string(100'000, '[')), 65, "no e-map"},
+          {"emap import " + File("broken", "{\"lookhaven_emap\":1,"), 65, "not an e-map"},
+          {"emap import " + File("deep", std::string(100'000, '[')), 65, "not an e-map"},
           {"emap remove 3", 66, "no e-map 3"}});
 }
 

@@ -115,7 +115,7 @@ TEST_F(VerifyTest, FindsAndRepairsEachKindOfDamage) {
         {"unknown files", [&] { test::Write(day / "holiday.mkv", "mine"); }, "", "", kFrames},
         {"no index", [&] { fs::remove(Index()); }, "No such file", "closed", kFrames},
         {"an empty index", [&] { test::Write(Index(), ""); }, "is empty", "closed", kFrames},
-        {"a foreign index", [&] { test::Write(Index(), std::string(500, 'x')); }, "no frame index", "closed", kFrames},
+        {"a foreign index", [&] { test::Write(Index(), std::string(500, 'x')); }, "not a frame index", "closed", kFrames},
         {"a cut index", [&] { fs::resize_file(Index(), 64 + 24 * 30 + 5); }, "name its frames", "closed", kFrames},
         {"a bit of the index's head", [&] { Flip(Index(), 20); }, "damaged head", "closed", kFrames},
         {"a bit of an index entry", [&] { Flip(Index(), 64 + 24 * 50); }, "is damaged", "closed", kFrames},
