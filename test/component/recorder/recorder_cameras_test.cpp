@@ -88,7 +88,7 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
         base::SignalLoss loss = kOther;
         int camera = 0;
     } rows[] = {
-        {"test:nonsense", "no test pattern"},
+        {"test:nonsense", "unknown test pattern"},
         {"test:mjpeg?size=1x1", "has a size"},
         {"file:" + (home_ / "missing.mkv").string(), "not a regular file"},
         {"file:/dev/zero", "not a regular file"},

@@ -19,7 +19,7 @@ function badge(alerts: Alerts, closed: AbortSignal): HTMLElement {
   const root = element("span", { class: "nav-badge" });
   const show = () => {
     root.hidden = alerts.count === 0;
-    setText(root, alerts.count > 99 ? "99+" : String(alerts.count));
+    setText(root, alerts.count > 99 ? "99+" : String(alerts.count || ""));
     root.title = `${alerts.count} new since you looked`;
   };
   alerts.listen(show, closed);

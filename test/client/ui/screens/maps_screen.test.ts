@@ -46,7 +46,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     // A session that ends asks nobody.
     client.server.hasSession = false;
     await page.keyboard.press("Control+s");
-    await page.getByLabel("Account").fill("x");
+    await page.getByLabel("Account", { exact: true }).fill("x");
     await page.getByLabel("Password").fill("x");
     await page.keyboard.press("Enter");
     await page.locator(".map-editor .map-item[style*='--x: 6']").click();

@@ -114,7 +114,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     expect(asked).toBe(3);
     client.server.hasSession = false;
     await save(page);
-    await page.getByLabel("Account").fill("x");
+    await page.getByLabel("Account", { exact: true }).fill("x");
     await page.getByLabel("Password").fill("x");
     await page.keyboard.press("Enter");
     await page.getByText("Your changes from before").waitFor();
@@ -160,7 +160,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
       ["unreachable", /No Lookhaven host answers/],
       ["certificate", /was not sent/],
       ["code", /valid once/],
-      ["tooMany", /again in a minute/],
+      ["tooMany", /compare it/],
+      ["unclear", /may be used up/],
     ] as const;
     for (const [why, said] of refusals) {
       setup.whyNoHost = why;
