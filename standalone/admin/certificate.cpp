@@ -76,7 +76,7 @@ Json::Value CurrentCertificate(const base::Installation& installation) {
 Json::Value ExamineCertificate(store::Store& store, const base::Installation& installation, const Actor& actor,
                                const CertificateOffer& offer) {
     RequireManager(store, actor);
-    return Told(store, CertificateFolder(installation).Certificates(), Read(offer));
+    return Told(store, CertificateFolder::Certificates(installation), Read(offer));
 }
 
 Json::Value ReplaceCertificate(store::Store& store, const base::Installation& installation, const Actor& actor,
@@ -86,7 +86,7 @@ Json::Value ReplaceCertificate(store::Store& store, const base::Installation& in
     // Whose browser goes meanwhile leaves no web server that was not told.
     const base::BlockedSignals whole;
     CertificateFolder folder(installation);
-    const std::string known = folder.Certificates();
+    const std::string known = CertificateFolder::Certificates(installation);
     const Json::Value before = RecordOf(known);
     const Json::Value after = CertificateRecord(pair.facts);
     Json::Value told = Told(store, known, pair);

@@ -7,6 +7,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/admin/change.h"
 #include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/store/store.h"
@@ -32,7 +33,11 @@ CertificateFolder::CertificateFolder(const base::Installation& installation)
     : home_(installation.Home()),
       used_(installation.TlsFolder()),
       other_(home_ / "tls.new"),
-      lock_(base::LockFile(installation.RunFolder() / "certificate.lock")) {}
+      lock_(base::TryLockFile(installation.CertificateLockFile())) {
+    if (!lock_) {
+        throw StillNeeded("the certificate is being replaced by somebody else at this moment");
+    }
+}
 
 CertificateFolder::~CertificateFolder() {
     if (is_prepared_) {
@@ -41,9 +46,9 @@ CertificateFolder::~CertificateFolder() {
     }
 }
 
-std::string CertificateFolder::Certificates() const {
+std::string CertificateFolder::Certificates(const base::Installation& installation) {
     try {
-        return base::ReadFile(used_ / kCertificate);
+        return base::ReadFile(installation.TlsFolder() / kCertificate);
     } catch (const std::system_error&) {
         return "";
     }

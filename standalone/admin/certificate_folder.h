@@ -6,7 +6,7 @@
 //               server from starting. So a whole folder is made beside theirs, and the two folders change places.
 // Invariants    (1) Whoever looks, whenever this process or the machine dies: the files of the folder belong together.
 //               (2) What else an owner keeps in the folder stays in it.
-// One at a time: the constructor waits for whoever else replaces them.
+// One at a time: the constructor throws where somebody else replaces them.
 #pragma once
 
 #include <filesystem>
@@ -19,15 +19,15 @@ namespace lookhaven::admin {
 
 class CertificateFolder {
   public:
-    // Throws std::system_error, as each of these does.
+    // Throws StillNeeded while another process replaces the certificate; std::system_error, as each of these does.
     explicit CertificateFolder(const base::Installation& installation);
     // Removes what was prepared, or what it has replaced.
     ~CertificateFolder();
     CertificateFolder(const CertificateFolder&) = delete;
     CertificateFolder& operator=(const CertificateFolder&) = delete;
 
-    // Empty where there is none that can be read.
-    std::string Certificates() const;
+    // Those in use; empty where there is none that can be read. Needs no lock.
+    static std::string Certificates(const base::Installation& installation);
     // Writes both, readable by the owner alone, to what is not in use. Throws store::InvalidRecord where the folder in
     // use is a link or has folders in it, which are the owner's to take away. What a process that died has left becomes
     // the folder tls.before.

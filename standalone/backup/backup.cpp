@@ -219,6 +219,7 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     writer.Add(kRecords, records);
     summary.pictures = writer.AddFolder(kPictures, installation.Home() / kPictures);
     if (certificate == Certificate::kIncluded) {
+        const base::FileDescriptor pair = base::LockFile(installation.CertificateLockFile());
         summary.has_certificate = writer.AddFolder(kCertificate, installation.TlsFolder()) > 0;
         writer.AddFolder(kSigning, installation.SigningKeyFile().parent_path());
     }

@@ -39,6 +39,17 @@ FileDescriptor LockFile(const std::filesystem::path& path) {
     return file;
 }
 
+FileDescriptor TryLockFile(const std::filesystem::path& path) {
+    FileDescriptor file = OpenFile(path, O_RDWR | O_CREAT | O_NOFOLLOW);
+    if (::flock(file.Get(), LOCK_EX | LOCK_NB) != 0) {
+        if (errno != EWOULDBLOCK) {
+            ThrowErrno("cannot lock " + path.string());
+        }
+        return {};
+    }
+    return file;
+}
+
 std::string ReadFile(const std::filesystem::path& path) {
     const FileDescriptor file = OpenFile(path, O_RDONLY);
     std::string contents;

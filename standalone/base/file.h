@@ -21,6 +21,8 @@ FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsigned i
 // Opens the file, creating it if missing, and waits for its exclusive lock (flock), which is held until the descriptor
 // is closed. Throws std::system_error.
 FileDescriptor LockFile(const std::filesystem::path& path);
+// The same without waiting: empty while somebody else has the lock.
+FileDescriptor TryLockFile(const std::filesystem::path& path);
 
 // The file's whole contents; throws std::system_error when it cannot be read.
 std::string ReadFile(const std::filesystem::path& path);

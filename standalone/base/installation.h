@@ -28,6 +28,8 @@ class Installation {
     std::filesystem::path LogFolder() const { return home_ / "log"; }
     std::filesystem::path TlsFolder() const { return home_ / "tls"; }
     std::filesystem::path SigningKeyFile() const { return home_ / "signing" / "key.pem"; }
+    // Held while certificate and key change places, or are copied together.
+    std::filesystem::path CertificateLockFile() const { return RunFolder() / "certificate.lock"; }
     std::filesystem::path ProgressFolder() const { return RunFolder() / "progress"; }
     std::filesystem::path WebApiSocket() const { return RunFolder() / "webapi.sock"; }
 

@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include "standalone/admin/certificate_folder.h"
+#include "standalone/admin/change.h"
 #include "standalone/admin/web_server.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
@@ -240,7 +241,10 @@ TEST_P(CertificateTest, FitsItsKeyWheneverAProcessDies) {
         EXPECT_TRUE(std::filesystem::exists(installation_.Home() / "tls.new"));
         EXPECT_EQ(OnDisk(), row.left);
     }
-    CertificateFolder(installation_).Certificates();  // whoever only looks deletes nothing
+    {
+        const CertificateFolder held(installation_);  // deletes nothing that it has not made
+        EXPECT_THROW(Replace("rsa", manager_, is_away_), StillNeeded) << "nobody waits for the web server of another";
+    }
     Replace("rsa", manager_, is_away_);
     EXPECT_EQ(base::ReadFile(installation_.Home() / "tls.before/key.pem"), File("ec.key"))
         << "the last pair that a web server took";
