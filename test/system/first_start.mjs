@@ -38,7 +38,7 @@ await visit(async (page, complaints) => {
   await look("camera");
 
   await page.getByRole("link", { name: "Next: storage" }).click();
-  await page.locator(".mount-card", { hasText: "default" }).waitFor();
+  await page.locator(".record-card", { hasText: "default" }).waitFor();
   await look("storage");
 
   await page.getByRole("link", { name: "Finish" }).click();

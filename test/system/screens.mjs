@@ -63,9 +63,9 @@ await visit(async (page, complaints) => {
     ["devices", "devices", ".device-row"],
     ["accounts", "accounts", ".record-row"],
     ["account", "accounts&open=2", ".rights"],
-    ["storage", "storage", ".mount-card"],
+    ["storage", "storage", ".record-card"],
     ["mount", "storage&open=1", ".form"],
-    ["hosts", "hosts", ".mount-card details"],
+    ["hosts", "hosts", ".record-card details"],
     ["system", "system", ".health-summary"],
     ["audit", "audit", ".audit-entry, .settings-state"],
   ]) {

@@ -73,7 +73,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.getByText("1 problem", { exact: true }).waitFor();
     await page.getByRole("button", { name: "Copy lookhaven init" }).click();
     await page.getByText(/Copied|Selected/).waitFor();
-    for (const text of ["1.2.3", "SQLite, schema 7", "AB:CD", "CN=nvr", "Well: folder."]) await page.getByText(text).waitFor();
+    for (const text of ["1.2.3", "SQLite, schema 7", "AB:CD", "CN=nvr", "OK: folder."]) await page.getByText(text).waitFor();
     client.server.isAway = true;
     await page.getByRole("button", { name: "Check again" }).click();
     await page.getByRole("alert").getByText("does not answer").waitFor();

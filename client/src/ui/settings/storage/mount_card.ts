@@ -7,6 +7,7 @@ import { settingsAddress } from "../../screens/route";
 import { bytesText } from "../../widgets/amounts";
 import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
+import { factList } from "../../widgets/fact_list";
 import { svgElement } from "../../widgets/svg";
 import { plainTable } from "../../widgets/table";
 import { minuteText } from "../../widgets/text";
@@ -19,30 +20,27 @@ export function mountCard(mount: MountRecord): HTMLElement {
   const marks = [mount.default ? "default" : "", stateText(mount)].filter((text) => text).join(" · ");
   const head = element(
     "header",
-    { class: "mount-head" },
+    { class: "record-head" },
     element("h3", {}, name),
-    element("span", { class: isWell || !enabled ? "quiet" : "mount-trouble" }, marks),
+    element("span", { class: isWell || !enabled ? "quiet" : "record-trouble" }, marks),
     element("span", { class: "bar-gap" }),
     linkButton("Change", settingsAddress("storage", id)),
   );
   head.lastElementChild!.setAttribute("aria-label", `Change ${name}`);
-  const trouble = message ? [element("p", { class: "mount-trouble" }, message)] : [];
-  const fact = (label: string, text: string) => element("div", {}, element("dt", {}, label), element("dd", {}, text));
+  const trouble = message ? [element("p", { class: "record-trouble" }, message)] : [];
   const oldest = mount.oldest ? minuteText(mount.oldest * 1000) : "none";
-  const facts = element(
-    "dl",
-    { class: "mount-facts" },
-    fact("Recordings", bytesText(mount.used)),
-    fact("Free", total === null || free === null ? "unknown" : `${bytesText(free)} of ${bytesText(total)}`),
-    fact("Oldest footage", oldest),
-    fact("Per day", bytesText(mount.perDay)),
-    fact("Limits", limitText(mount.limit)),
-  );
+  const facts = factList([
+    ["Recordings", bytesText(mount.used)],
+    ["Free", total === null || free === null ? "unknown" : `${bytesText(free)} of ${bytesText(total)}`],
+    ["Oldest footage", oldest],
+    ["Per day", bytesText(mount.perDay)],
+    ["Limits", limitText(mount.limit)],
+  ]);
   return element(
     "li",
-    { class: "mount-card" },
+    { class: "record-card" },
     head,
-    element("p", { class: "quiet mount-path" }, path),
+    element("p", { class: "quiet record-place" }, path),
     ...trouble,
     ...(total === null || free === null ? [] : [usageBar(total, free, mount.used)]),
     element("p", { class: "mount-forecast" }, forecastText(mount.lastsDays)),

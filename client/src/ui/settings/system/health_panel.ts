@@ -6,6 +6,7 @@ import type { Certificate, System, SystemStatus } from "../../../wire/system";
 import { asServerError } from "../../../wire/server";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
+import { factList } from "../../widgets/fact_list";
 import { formPart } from "../../widgets/fields";
 import { calendarDate } from "../../widgets/text";
 import { askForCertificate } from "./certificate_dialog";
@@ -24,7 +25,7 @@ export class HealthPanel {
 
   /** Looks at everything, which may take seconds. What was seen before stays until then. */
   async load(): Promise<void> {
-    const text = element("p", { class: "quiet", role: "status" }, "Checking each part; this may take seconds…");
+    const text = element("p", { class: "quiet", role: "status" }, "Running the checks; this may take seconds…");
     if (this.root.childElementCount === 0) this.root.append(formPart("Health", text));
     try {
       const status = await this.#system.status(this.#closed);
@@ -47,7 +48,7 @@ function content(status: SystemStatus, replaceCertificate: () => void): HTMLElem
   const summary = element("p", { class: "health-summary", role: "status" }, summaryText(lines));
   const list = lines.length > 0 ? [element("ul", { class: "settings-list health-list" }, ...lines.map(lineRow))] : [];
   const well = check.filter(({ ok, finding }) => ok && finding.length === 0).map(({ name }) => name);
-  const rest = well.length > 0 ? [element("p", { class: "quiet" }, `Well: ${well.join(", ")}.`)] : [];
+  const rest = well.length > 0 ? [element("p", { class: "quiet" }, `OK: ${well.join(", ")}.`)] : [];
   const facts = factList([
     ["Version", version],
     ...part.map((one): [string, string] => [partName(one), partText(one)]),
@@ -55,7 +56,7 @@ function content(status: SystemStatus, replaceCertificate: () => void): HTMLElem
   ]);
   return [
     formPart("Health", summary, ...list, ...rest),
-    formPart("Parts", facts),
+    formPart("Components", facts),
     formPart(
       "Certificate",
       ...certificateContent(certificate),
@@ -88,10 +89,4 @@ function certificateContent(certificate: Certificate | null): HTMLElement[] {
     copyable(fingerprint),
     ...(selfSigned ? [element("p", { class: "form-hint" }, hint)] : []),
   ];
-}
-
-function factList(facts: readonly (readonly [label: string, text: string])[]): HTMLElement {
-  const fact = ([label, text]: readonly [string, string]) =>
-    element("div", {}, element("dt", {}, label), element("dd", {}, text));
-  return element("dl", { class: "mount-facts" }, ...facts.map(fact));
 }

@@ -6,6 +6,7 @@ import { asServerError } from "../../../wire/server";
 import type { LogLevels, System } from "../../../wire/system";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
+import { factList } from "../../widgets/fact_list";
 import { formPart, selectField, type Field } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
@@ -31,11 +32,9 @@ export class LogPanel {
     try {
       const levels = await this.#system.logLevels();
       if (this.#closed.aborted) return;
-      const facts = entries(levels).map(([name, level]) =>
-        element("div", {}, element("dt", {}, labelOf(name)), element("dd", {}, level)),
-      );
       const change = button("Change log levels…", () => void this.#change(levels));
-      this.#show(element("dl", { class: "mount-facts" }, ...facts), element("div", { class: "form-buttons" }, change));
+      const facts = entries(levels).map(([name, level]): [string, string] => [labelOf(name), level]);
+      this.#show(factList(facts), element("div", { class: "form-buttons" }, change));
     } catch (error) {
       if (this.#closed.aborted) return;
       const again = button("Try again", () => void this.load());
