@@ -2,11 +2,9 @@
 #include "standalone/admin/log_levels.h"
 
 #include <algorithm>
-#include <set>
 
 #include "standalone/admin/change.h"
 #include "standalone/base/process.h"
-#include "standalone/control/debug_log_config.h"
 
 namespace lookhaven::admin {
 
@@ -14,28 +12,8 @@ namespace {
 
 constexpr int kErrorsOnly = 1;  // of a configuration that nobody has made yet
 
-// Most of the categories are unused and stay at the level that most have.
-int CommonLevel(const control::DebugLogConfig& config) {
-    std::map<int, int> uses;
-    for (const int level : config.category_level) {
-        ++uses[level];
-    }
-    return std::max_element(uses.begin(), uses.end(), [](auto& a, auto& b) { return a.second < b.second; })->first;
-}
-
 bool HasName(int category) {
     return std::ranges::any_of(LogCategories(), [category](const auto& named) { return named.second == category; });
-}
-
-std::set<int> Listed(const control::DebugLogConfig& config) {
-    const int common = CommonLevel(config);
-    std::set<int> listed;
-    for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
-        if (HasName(category) || config.category_level[category] != common) {
-            listed.insert(category);
-        }
-    }
-    return listed;
 }
 
 Json::Value Entry(const char* key, const Json::Value& of, int level) {
@@ -48,7 +26,7 @@ Json::Value Entry(const char* key, const Json::Value& of, int level) {
 Json::Value RecordOf(const control::DebugLogConfig& config) {
     Json::Value json;
     json["category"] = Json::arrayValue;
-    for (const int category : Listed(config)) {
+    for (const int category : ListedCategories(config)) {
         json["category"].append(
             Entry("name", base::NameOf(LogCategories(), category), config.category_level[category]));
     }
@@ -102,7 +80,7 @@ void RequirePossible(const LogChange& change) {
 }
 
 void Make(control::DebugLogEditor& editor, const LogChange& change) {
-    const std::set<int> listed = Listed(editor.Config());
+    const std::set<int> listed = ListedCategories(editor.Config());
     if (change.every) {
         editor.SetEveryCategory(*change.every);
     }
@@ -134,6 +112,25 @@ const base::Names<int>& LogLevels() {
 const base::Names<int>& LogCategories() {
     static const base::Names<int> names = {{"liveview", 32}, {"player", 68}};
     return names;
+}
+
+int CommonLevel(const control::DebugLogConfig& config) {
+    std::map<int, int> uses;
+    for (const int level : config.category_level) {
+        ++uses[level];
+    }
+    return std::max_element(uses.begin(), uses.end(), [](auto& a, auto& b) { return a.second < b.second; })->first;
+}
+
+std::set<int> ListedCategories(const control::DebugLogConfig& config) {
+    const int common = CommonLevel(config);
+    std::set<int> listed;
+    for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
+        if (HasName(category) || config.category_level[category] != common) {
+            listed.insert(category);
+        }
+    }
+    return listed;
 }
 
 Json::Value LogRecord(const base::Installation& installation) {

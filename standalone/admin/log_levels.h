@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <map>
 #include <optional>
+#include <set>
 
 #include <json/json.h>
 #include <sys/types.h>
@@ -13,6 +14,7 @@
 #include "standalone/admin/actor.h"
 #include "standalone/base/installation.h"
 #include "standalone/base/names.h"
+#include "standalone/control/debug_log_config.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::admin {
@@ -21,9 +23,13 @@ const base::Names<int>& LogLevels();
 // Those that have a name; each of the 512 has a number.
 const base::Names<int>& LogCategories();
 
+// The level of most categories, which are unused; and those that have a name, or another level than most.
+int CommonLevel(const control::DebugLogConfig& config);
+std::set<int> ListedCategories(const control::DebugLogConfig& config);
+
 // {"category": [{"name", "level"}], "others": level, "process": [{"pid", "level"}], "revision"}. Levels are words of
-// LogLevels. category: those that have a name, and those whose level is not that of most, by their number. others: the
-// level of most. The revision stands for categories and others.
+// LogLevels. category: the listed ones, those without a name by their number. others: the level of most. The revision
+// stands for categories and others.
 Json::Value LogRecord(const base::Installation& installation);
 
 // What is missing stays.

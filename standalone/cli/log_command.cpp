@@ -2,7 +2,6 @@
 //
 // lookhaven log: the log levels of the installation's processes.
 #include <algorithm>
-#include <map>
 
 #include "standalone/admin/log_levels.h"
 #include "standalone/cli/command_group.h"
@@ -36,34 +35,21 @@ std::string LevelTable(const Json::Value& data) {
     return Table(kColumns, rows);
 }
 
-// Most of the 512 categories are unused and stay at the level that most have.
-int CommonLevel(const control::DebugLogConfig& config) {
-    std::map<int, int> uses;
-    for (const int level : config.category_level) {
-        ++uses[level];
-    }
-    return std::max_element(uses.begin(), uses.end(), [](auto& a, auto& b) { return a.second < b.second; })->first;
-}
-
 void Show(const Console& console) {
     const control::DebugLogConfig* config = control::MapDebugLog(console.Installation());
     if (config == nullptr) {
         throw Failure(kNoInput, "there is no log configuration yet: run lookhaven init");
     }
-    const int common = CommonLevel(*config);
-    Json::Value categories = Json::arrayValue;
-    for (int category = 0; category < control::kDebugLogCategoryCount; ++category) {
-        const int level = config->category_level[category];
-        const std::string name = NameOf(admin::LogCategories(), category);
-        if (level != common || admin::LogCategories().contains(name)) {
-            categories.append(Object("category", category, "name", name, "level", level));
-        }
-    }
+    const Json::Value categories = Array(admin::ListedCategories(*config), [config](int category) {
+        return Object("category", category, "name", NameOf(admin::LogCategories(), category), "level",
+                      config->category_level[category]);
+    });
     Json::Value processes = Json::arrayValue;
     for (int i = 0; i < std::min(config->process_count, control::kDebugLogProcessCount); ++i) {
         processes.append(Object("pid", config->process[i].pid, "level", config->process[i].level));
     }
-    const Json::Value data = Object("other_categories", common, "categories", categories, "processes", processes);
+    const Json::Value data =
+        Object("other_categories", admin::CommonLevel(*config), "categories", categories, "processes", processes);
     console.Answer(data, LevelTable(data));
 }
 
