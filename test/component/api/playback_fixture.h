@@ -3,8 +3,6 @@
 // A host whose players the tests control and watch.
 #pragma once
 
-#include <array>
-#include <cerrno>
 #include <chrono>
 #include <csignal>
 #include <filesystem>
@@ -12,10 +10,9 @@
 #include <string>
 
 #include <gtest/gtest.h>
-#include <sys/socket.h>
-#include <sys/time.h>
 
 #include "standalone/store/settings.h"
+#include "test/component/api/stream_reader.h"
 #include "test/support/host/host_under_test.h"
 
 namespace lookhaven::api {
@@ -28,45 +25,32 @@ using host::HostUnderTest;
 class Player {
   public:
     Player(const HostUnderTest& host, const std::string& cookie, const std::string& query)
-        : connection_(host.OpenQuery("api=VEXO.Lookhaven.Player&version=1&method=" + query, cookie)) {}
+        : stream_(host.OpenQuery("api=VEXO.Lookhaven.Player&version=1&method=" + query, cookie)) {}
 
     // The number behind name in the newest part; waits for a part that came after this call. Nothing when it has ended.
     std::optional<int> Tell(const std::string& name) {
-        Read();
-        text_.clear();
+        stream_.Read();
+        stream_.text.clear();
         const auto until = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-        for (std::string wanted = name + "="; !ended_ && std::chrono::steady_clock::now() < until; Read()) {
-            const std::size_t end = text_.rfind(';');
-            const std::size_t begin = end == text_.npos ? end : text_.rfind("rate=", end);
-            const std::size_t at = begin == text_.npos ? begin : text_.find(wanted, begin);
-            if (at != text_.npos && at < end) {
-                return std::stoi(text_.substr(at + wanted.size()));
+        for (std::string wanted = name + "="; !stream_.HasEnded() && std::chrono::steady_clock::now() < until;
+             stream_.Read()) {
+            const std::size_t end = stream_.text.rfind(';');
+            const std::size_t begin = end == stream_.text.npos ? end : stream_.text.rfind("rate=", end);
+            const std::size_t at = begin == stream_.text.npos ? begin : stream_.text.find(wanted, begin);
+            if (at != stream_.text.npos && at < end) {
+                return std::stoi(stream_.text.substr(at + wanted.size()));
             }
         }
         return std::nullopt;
     }
     bool HasEnded() {
-        Read();
-        return ended_;
+        stream_.Read();
+        return stream_.HasEnded();
     }
-    void Close() { connection_.Reset(); }
+    void Close() { stream_.Close(); }
 
   private:
-    void Read() {
-        std::array<char, 65536> block{};
-        const timeval limit{0, 20'000};
-        setsockopt(connection_.Get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
-        const ssize_t got = recv(connection_.Get(), block.data(), block.size(), 0);
-        if (got > 0) {
-            text_.append(block.data(), static_cast<std::size_t>(got));
-        } else {
-            ended_ = got == 0 || (errno != EAGAIN && errno != EINTR);
-        }
-    }
-
-    base::FileDescriptor connection_;
-    std::string text_;
-    bool ended_ = false;
+    StreamReader stream_;
 };
 
 class Playback : public testing::Test {

@@ -1,16 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // VEXO.Event Watch: what is told to whom, in which order, and what a client finds that comes back.
-#include <array>
 #include <string>
 #include <vector>
-
-#include <sys/socket.h>
-#include <sys/time.h>
 
 #include "standalone/base/clock.h"
 #include "standalone/store/marks.h"
 #include "test/component/api/event_fixture.h"
+#include "test/component/api/stream_reader.h"
 
 namespace lookhaven::api {
 
@@ -22,18 +19,18 @@ using host::Eventually;
 class Watcher {
   public:
     Watcher(const HostUnderTest& host, const std::string& cookie, const std::string& after = "")
-        : connection_(host.OpenQuery("api=VEXO.Event&version=1&method=Watch&after=" + after, cookie)) {}
+        : stream_(host.OpenQuery("api=VEXO.Event&version=1&method=Watch&after=" + after, cookie)) {}
 
     // The texts of the marks told so far, once that many were; what was told instead after five seconds.
     std::string Texts(std::size_t marks) {
         std::string told;
         Eventually([&] {
-            Read();
+            stream_.Read();
             told.clear();
             std::size_t count = 0;
-            for (std::size_t at = 0; (at = text_.find(R"("text":[")", at)) != text_.npos; ++count) {
+            for (std::size_t at = 0; (at = stream_.text.find(R"("text":[")", at)) != stream_.text.npos; ++count) {
                 at += 9;
-                told += text_.substr(at, text_.find('"', at) - at) + ' ';
+                told += stream_.text.substr(at, stream_.text.find('"', at) - at) + ' ';
             }
             return count >= marks;
         });
@@ -42,44 +39,33 @@ class Watcher {
     // Waits for the first event.
     bool IsResumed() {
         Eventually([&] {
-            Read();
-            return text_.find("\"resumed\":") != text_.npos;
+            stream_.Read();
+            return stream_.text.find("\"resumed\":") != stream_.text.npos;
         });
-        return text_.find("\"resumed\":true") != text_.npos;
+        return stream_.text.find("\"resumed\":true") != stream_.text.npos;
     }
     // False for an answer that is no stream.
     bool Begins() {
         Eventually([&] {
-            Read();
-            return has_ended_ || text_.find("event: start") != text_.npos;
+            stream_.Read();
+            return stream_.HasEnded() || stream_.text.find("event: start") != stream_.text.npos;
         });
-        return !has_ended_;
+        return !stream_.HasEnded();
     }
     // The place of the last event.
     std::string Place() const {
-        const std::size_t at = text_.rfind("\nid: ") + 5;
-        return text_.substr(at, text_.find('\n', at) - at);
+        const std::size_t at = stream_.text.rfind("\nid: ") + 5;
+        return stream_.text.substr(at, stream_.text.find('\n', at) - at);
     }
     bool Ends() {
         return Eventually([&] {
-            Read();
-            return has_ended_;
+            stream_.Read();
+            return stream_.HasEnded();
         });
     }
 
   private:
-    void Read() {
-        std::array<char, 65536> block{};
-        const timeval limit{0, 20'000};
-        setsockopt(connection_.Get(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
-        const ssize_t got = recv(connection_.Get(), block.data(), block.size(), 0);
-        has_ended_ = has_ended_ || got == 0;
-        text_.append(block.data(), got > 0 ? static_cast<std::size_t>(got) : 0);
-    }
-
-    base::FileDescriptor connection_;
-    std::string text_;
-    bool has_ended_ = false;
+    StreamReader stream_;
 };
 
 class WatchApi : public EventApi {
