@@ -87,17 +87,22 @@ Offer Accept(const store::RecordingServer& server, const remote::PairingCode& co
 
 }  // namespace
 
-PairingOutcome PairByCode(store::Store& store, const Actor& actor, const std::string& name, const std::string& address,
-                          int port, const remote::PairingCode& code) {
-    RequireManager(store, actor);
-    if (!base::IsHost(address) || port < 1 || port > 65'535) {
-        throw store::InvalidRecord("a server is reached by a host name or address, and a port from 1 to 65535");
+PairingOutcome PairByCode(const Records& records, const Actor& actor, store::RecordingServer server,
+                          const remote::PairingCode& code, bool confirmed) {
+    RequireManager(records.open(), actor);
+    if (!base::IsHost(server.address) || server.port < 1 || server.port > 65'535) {
+        throw store::InvalidRecord("a host is reached by a host name or address, and a port from 1 to 65535");
     }
-    store::RecordingServer server{.name = name, .address = address, .port = port};
-    server.certificate = FetchRightCertificates(address, port, code);
-    store::RecordingServers(store).RequirePairable(server);
+    records.close();
+    server.certificate = FetchRightCertificates(server.address, server.port, code);
+    store::RecordingServers(records.open()).RequirePairable(server);
+    if (!confirmed) {
+        RequireSameServer(records.open(), server);
+    }
+    records.close();
     const Offer offer = Accept(server, code);
-    return {AddServer(store, actor, server, offer.secret, offer.cameras, true), offer.secret, offer.cameras.size()};
+    return {AddServer(records.open(), actor, server, offer.secret, offer.cameras, true), offer.secret,
+            offer.cameras.size()};
 }
 
 }  // namespace lookhaven::admin

@@ -3,6 +3,7 @@
 // Pairs this host with one whose cameras it is to show, by the code that is shown there.
 #pragma once
 
+#include <functional>
 #include <stdexcept>
 #include <string>
 
@@ -37,10 +38,17 @@ struct PairingOutcome {
     std::size_t cameras = 0;
 };
 
-// Connects to the address, compares the certificate with the code before anything else is sent, and stores the host
-// with its cameras under that name, as AddServer does, with central management on. Blocks for 20 seconds at most.
-// Throws CannotPair, and as AddServer does; for a name or address that cannot be stored, before the code is used up.
-PairingOutcome PairByCode(store::Store& store, const Actor& actor, const std::string& name, const std::string& address,
-                          int port, const remote::PairingCode& code);
+// The record store of whoever calls, which is closed while the other host is waited for.
+struct Records {
+    std::function<store::Store&()> open;
+    std::function<void()> close = [] {};
+};
+
+// Connects to the server's address, compares the certificate with the code before anything else is sent, and stores the
+// host with its cameras under its name, as AddServer does, with central management on. Only name, address and port of
+// the server are looked at. Blocks for 25 seconds at most. Throws CannotPair, and as AddServer does; before the code is
+// used up, for a name or address that cannot be stored, and MovesDenials unless confirmed.
+PairingOutcome PairByCode(const Records& records, const Actor& actor, store::RecordingServer server,
+                          const remote::PairingCode& code, bool confirmed);
 
 }  // namespace lookhaven::admin

@@ -138,6 +138,17 @@ ServerLoss LossOf(store::Store& store, int id) {
     return {RecordingServers(store).ListCameras(id), RecordingServers(store).Denials(id)};
 }
 
+void RequireSameServer(store::Store& store, const RecordingServer& server) {
+    for (const RecordingServer& known : RecordingServers(store).List()) {
+        if (known.name == server.name && !known.address.empty() && known.certificate != server.certificate) {
+            ServerLoss loss = LossOf(store, known.id);
+            if (!loss.denials.empty()) {
+                throw MovesDenials(std::move(loss));
+            }
+        }
+    }
+}
+
 ServerLoss RemoveServer(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,
                         bool confirmed) {
     ServerLoss loss;

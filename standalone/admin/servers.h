@@ -75,6 +75,23 @@ class RemovesDenials : public std::runtime_error {
     ServerLoss loss_;
 };
 
+// A server is known by that name whose certificate is another one, and users are denied something of it. Were the new one
+// stored, they would be denied what has the same ids there, and nothing of the old one.
+class MovesDenials : public std::runtime_error {
+  public:
+    explicit MovesDenials(ServerLoss loss)
+        : std::runtime_error("the host that is known by this name has another certificate; what users are denied of it "
+                             "would hold for this one"),
+          loss_(std::move(loss)) {}
+    const ServerLoss& Loss() const { return loss_; }
+
+  private:
+    ServerLoss loss_;
+};
+
+// Before AddServer, where nobody has confirmed it. Throws MovesDenials.
+void RequireSameServer(store::Store& store, const store::RecordingServer& server);
+
 // Ends the pairing, and returns what went with it. seen: the record's revision that the actor saw; nothing for whatever
 // it is. Throws RemovesDenials unless confirmed, and Stale.
 ServerLoss RemoveServer(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen,

@@ -140,17 +140,23 @@ std::string Pair(const Call& call) {
     std::string address;
     std::string text;
     int port = kDefaultPort;
+    bool is_confirmed = false;
     TakeField(call, "name", name);
     TakeField(call, "address", address);
     TakeField(call, "port", port);
     TakeField(call, "code", text);
+    TakeField(call, "confirm", is_confirmed);
+    Json::Value data;
     try {
         const remote::PairingCode code = remote::ParsePairingCode(text);
         Reauthenticate(call, "reauth");
-        const admin::PairingOutcome made = admin::PairByCode(call.Records(), call.Actor(), name, address, port, code);
-        Json::Value data;
+        const admin::Records records{[&call]() -> store::Store& { return call.Records(); },
+                                     [&call] { call.context.CloseRecords(); }};
+        const admin::PairingOutcome made = admin::PairByCode(
+            records, call.Actor(), {.name = name, .address = address, .port = port}, code, is_confirmed);
         data["server"] = Describe(call.Records(), made.server);
-        return SuccessAnswer(data);
+    } catch (const admin::MovesDenials& refusal) {
+        data["confirm"] = ToJson(refusal.Loss());
     } catch (const remote::InvalidPairingCode& error) {
         throw Failure(400, error.what());
     } catch (const admin::CannotPair& error) {
@@ -158,6 +164,7 @@ std::string Pair(const Call& call) {
                                       ": ", error.what()));
         throw Failure(502, error.what(), 0, NameOf(error.Why()));
     }
+    return SuccessAnswer(data);
 }
 
 std::string Remove(const Call& call) {

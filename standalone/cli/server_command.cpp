@@ -129,60 +129,7 @@ std::string ConnectionProblem(const RecordingServer& server, const std::string& 
                                     server.id, " --address ADDRESS --port PORT");
 }
 
-admin::PairingOutcome AddByLine(store::Store& store, const std::string& line, const Request& request) {
-    const PairOffer offer = ParsePairText(line);
-    remote::CertificateName(offer.certificate);  // throws before anything is stored
-    RecordingServer server{.name = request.name,
-                           .address = request.address.empty() ? offer.address : request.address,
-                           .port = request.change.port.value_or(offer.port),
-                           .certificate = remote::CertificatesIn(offer.certificate)};
-    server = admin::AddServer(store, {}, server, offer.secret, offer.cameras, false);
-    return {server, offer.secret, offer.cameras.size()};
-}
-
-admin::PairingOutcome AddByCode(store::Store& store, const std::string& line, const Request& request) try {
-    const remote::PairingCode code = remote::ParsePairingCode(line);
-    if (request.address.empty()) {
-        throw Failure(kUsage, "with a code, --address says where the other host is reached");
-    }
-    return admin::PairByCode(store, {}, request.name, request.address, request.change.port.value_or(kDefaultPort),
-                             code);
-} catch (const remote::InvalidPairingCode& error) {
-    throw Failure(kDataError, error.what(), "; the line from lookhaven server pair begins with ", kPairTextPrefix);
-} catch (const admin::CannotPair& error) {
-    throw Failure(kUnavailable, error.what());
-}
-
-void Add(const Console& console, const Request& request) {
-    const std::string line = ReadPairText();
-    store::Store store = console.OpenStore();
-    const auto add = line.starts_with(kPairTextPrefix) ? AddByLine : AddByCode;
-    const auto [server, secret, cameras] = add(store, line, request);
-    const std::string problem = ConnectionProblem(server, secret);
-    Json::Value data = ToData(server);
-    data["answers"] = problem.empty();
-    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", cameras, " cameras.", problem);
-}
-
-// Secret, certificate and cameras stay.
-void Change(const Console& console, const Request& request) {
-    store::Store store = console.OpenStore();
-    const RecordingServer server = admin::SetServer(store, {}, request.id, request.change);
-    const bool is_tried = server.enabled && !server.address.empty();
-    const std::string problem =
-        is_tried ? ConnectionProblem(server, RecordingServers(store).FindSecret(server.id)) : "";
-    Json::Value data = ToData(server);
-    data["answers"] = is_tried && problem.empty();
-    console.Answer(data, "Changed server ", server.name, ".", problem);
-}
-
-void List(const Console& console) {
-    store::Store store = console.OpenStore();
-    const Json::Value data = Array(RecordingServers(store).List(), ToData);
-    console.Answer(data, Table(kColumns, data));
-}
-
-Json::Value ToData(const store::ServerDenial& denial) {
+Json::Value DenialData(const store::ServerDenial& denial) {
     const char* kind = denial.kind == store::EmapItemType::kCamera ? "camera" : "I/O module";
     return Object("user", denial.user, "kind", kind, "id", denial.id);
 }
@@ -203,7 +150,69 @@ std::string DenialsText(const Json::Value& denials) {
 }
 
 Json::Value DenialsData(const admin::ServerLoss& loss) {
-    return Array(loss.denials, [](const auto& denial) { return ToData(denial); });
+    return Array(loss.denials, DenialData);
+}
+
+admin::PairingOutcome AddByLine(store::Store& store, const std::string& line, const Request& request) {
+    const PairOffer offer = ParsePairText(line);
+    remote::CertificateName(offer.certificate);  // throws before anything is stored
+    RecordingServer server{.name = request.name,
+                           .address = request.address.empty() ? offer.address : request.address,
+                           .port = request.change.port.value_or(offer.port),
+                           .certificate = remote::CertificatesIn(offer.certificate)};
+    if (!request.yes) {
+        admin::RequireSameServer(store, server);
+    }
+    server = admin::AddServer(store, {}, server, offer.secret, offer.cameras, false);
+    return {server, offer.secret, offer.cameras.size()};
+}
+
+admin::PairingOutcome AddByCode(store::Store& store, const std::string& line, const Request& request) try {
+    const remote::PairingCode code = remote::ParsePairingCode(line);
+    if (request.address.empty()) {
+        throw Failure(kUsage, "with a code, --address says where the other host is reached");
+    }
+    const admin::Records records{[&store]() -> store::Store& { return store; }};
+    return admin::PairByCode(
+        records, {},
+        {.name = request.name, .address = request.address, .port = request.change.port.value_or(kDefaultPort)}, code,
+        request.yes);
+} catch (const remote::InvalidPairingCode& error) {
+    throw Failure(kDataError, error.what(), "; the line from lookhaven server pair begins with ", kPairTextPrefix);
+} catch (const admin::CannotPair& error) {
+    throw Failure(kUnavailable, error.what());
+}
+
+void Add(const Console& console, const Request& request) try {
+    const std::string line = ReadPairText();
+    store::Store store = console.OpenStore();
+    const auto add = line.starts_with(kPairTextPrefix) ? AddByLine : AddByCode;
+    const auto [server, secret, cameras] = add(store, line, request);
+    const std::string problem = ConnectionProblem(server, secret);
+    Json::Value data = ToData(server);
+    data["answers"] = problem.empty();
+    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", cameras, " cameras.", problem);
+} catch (const admin::MovesDenials& refusal) {
+    throw Failure(kDataError, refusal.what(), " (", DenialsText(DenialsData(refusal.Loss())),
+                  "); add --yes to confirm, or another name");
+}
+
+// Secret, certificate and cameras stay.
+void Change(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const RecordingServer server = admin::SetServer(store, {}, request.id, request.change);
+    const bool is_tried = server.enabled && !server.address.empty();
+    const std::string problem =
+        is_tried ? ConnectionProblem(server, RecordingServers(store).FindSecret(server.id)) : "";
+    Json::Value data = ToData(server);
+    data["answers"] = is_tried && problem.empty();
+    console.Answer(data, "Changed server ", server.name, ".", problem);
+}
+
+void List(const Console& console) {
+    store::Store store = console.OpenStore();
+    const Json::Value data = Array(RecordingServers(store).List(), ToData);
+    console.Answer(data, Table(kColumns, data));
 }
 
 void Remove(const Console& console, const Request& request) {
@@ -271,7 +280,8 @@ void AddServer(CLI::App& program, const Console& console) {
         .Option("name", request.name, name, Required)
         .Option("--address", request.address, "The other host's address (default: as in the line)")
         .Option("--port", request.change.port, "Its HTTPS port (default: as in the line; with a code, 8443)",
-                Satisfies(CLI::Range(1, 65535)));
+                Satisfies(CLI::Range(1, 65535)))
+        .Flag("--yes", request.yes, "Also in place of another host of that name, of which users are denied something");
     group.Add("set", "Changes where a host is reached, or what it is called, without pairing again", Change)
         .Option("id", request.id, "The host's id", Required)
         .Option("--name", request.change.name, name)

@@ -41,7 +41,7 @@ export interface HostList {
 }
 
 const kApi = "VEXO.Server";
-/** The other host is asked twice. */
+/** The server takes 25 seconds at most. */
 const kPairTimeoutMs = 40_000;
 
 const kWhyNot: Record<string, string> = {
@@ -74,11 +74,15 @@ export class Hosts {
     return this.#call("Invite", { name, reauth });
   }
 
-  /** `reauth` as above. */
-  async pair(host: { name: string; address: string; port: number; code: string; reauth: string }): Promise<HostRecord> {
-    const how = { json: host, timeoutMs: kPairTimeoutMs };
+  /**
+   * `reauth` as above. In place of another host of that name, of which users are denied something, nothing is added
+   * unless `confirm`, and what they are denied comes back.
+   */
+  async pair(
+    host: { name: string; address: string; port: number; code: string; reauth: string; confirm: boolean },
+  ): Promise<{ server: HostRecord } | { confirm: HostLoss }> {
     try {
-      return (await this.#server.call<{ server: HostRecord }>(kApi, "Pair", {}, how)).server;
+      return await this.#server.call(kApi, "Pair", {}, { json: host, timeoutMs: kPairTimeoutMs });
     } catch (error) {
       const { status, code, message, data } = asServerError(error);
       const reason = kWhyNot[(data as { reason?: string } | null)?.reason ?? ""];

@@ -6,7 +6,7 @@ import type { CameraRecord } from "../../../client/src/wire/camera_setup";
 import type { DeviceRecord } from "../../../client/src/wire/devices";
 import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
-import type { HostRecord } from "../../../client/src/wire/hosts";
+import type { HostLoss, HostRecord } from "../../../client/src/wire/hosts";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { UserRecord } from "../../../client/src/wire/accounts";
 import type { LogLevels, OfferedCertificate, SettingRecord, SystemStatus } from "../../../client/src/wire/system";
@@ -35,6 +35,8 @@ export class FakeSetup {
   readonly host: HostRecord[] = [];
   /** Why no host is paired with, and why none answers; empty: they are, and do. */
   whyNoHost = "";
+  /** What users are denied of a host of the same name that is added. */
+  hostReplaced: HostLoss | null = null;
   /** All that was asked for but lists, with what it was asked with. */
   readonly asked: [method: string, request: Record<string, unknown>][] = [];
   readonly setting: SettingRecord[] = [];
@@ -89,8 +91,9 @@ export class FakeSetup {
   }
 
   #addHost(request: Request): Answer {
-    const { name, address, port, reauth } = request as unknown as HostRecord & { reauth: string };
+    const { name, address, port, reauth, confirm } = request as unknown as HostRecord & { reauth: string; confirm: boolean };
     if (reauth !== "right") return failed(403, "The password is wrong.");
+    if (this.hostReplaced && !confirm) return ok({ confirm: this.hostReplaced });
     const record = { id: 9, revision: 1, name, address, port, enabled: true, camera: [{ id: 7, idOnServer: 1, name: "Yard" }], denial: [] };
     this.host.push(record);
     return this.#note("Server.Pair", request, ok({ server: record }));

@@ -239,6 +239,12 @@ TEST_P(Pairing, IsChangedByManagersAloneAndTellsWhatGoesWithIt) {
         EXPECT_EQ(refusal.Loss().cameras.front().name, "Yard");
     }
     EXPECT_TRUE(servers_.Find(id));
+    store::RecordingServer other = servers_.Find(id).value();
+    EXPECT_NO_THROW(RequireSameServer(store_, other)) << "renewed";
+    other.certificate += kCertificate;
+    EXPECT_THROW(RequireSameServer(store_, other), MovesDenials);
+    other.name = "Annex";
+    EXPECT_NO_THROW(RequireSameServer(store_, other)) << "beside it";
     EXPECT_EQ(RemoveServer(store_, manager_, id, {}, true).denials.size(), 1U);
     EXPECT_THROW(RemoveServer(store_, manager_, id, {}, true), store::NotFound);
     const std::string record = R"({"address":"192.0.2.1",)";

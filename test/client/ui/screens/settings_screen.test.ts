@@ -169,11 +169,15 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     }
     expect(await dialog.getByLabel("Address").inputValue(), "what was typed stays").toBe("https://nvr2.example:443/");
     setup.whyNoHost = "";
+    setup.hostReplaced = { camera: [{ id: 7, idOnServer: 1, name: "Yard" }], denial: [{ user: "guard", kind: "camera", id: 7 }] };
+    await add(kCode, /Warehouse is known .* guard: Yard/);
+    expect(setup.host.length, "another one keeps its place until that is confirmed").toBe(0);
     await dialog.getByRole("button", { name: "Add the host" }).click();
-    await page.locator(".mount-head", { hasText: "answers" }).waitFor();
+    await page.locator(".record-head", { hasText: "answers" }).waitFor();
     await page.getByText("central management is off").waitFor();
-    const asked = { name: "Warehouse", address: "nvr2.example", port: 443, code: kCode, reauth: "right" };
+    const asked = { name: "Warehouse", address: "nvr2.example", port: 443, code: kCode, reauth: "right", confirm: true };
     expect(setup.asked).toEqual([["Server.Pair", asked]]);
+    setup.hostReplaced = null;
     setup.whyNoHost = "its clock is 5 minutes behind";
     await page.evaluate(() => location.reload());
     await page.getByText("Its clock is 5 minutes behind.").waitFor();

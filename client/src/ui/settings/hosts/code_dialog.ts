@@ -5,6 +5,7 @@
 import type { Hosts } from "../../../wire/hosts";
 import { secureAddress } from "../../../live/unplayable";
 import { element } from "../../widgets/dom";
+import { factList } from "../../widgets/fact_list";
 import { textField } from "../../widgets/fields";
 import { openDialog, openReauthDialog } from "../../widgets/form_dialog";
 import { clockTime } from "../../widgets/text";
@@ -29,7 +30,7 @@ export async function showCode(host: HTMLElement, hosts: Hosts): Promise<void> {
     title: `Code for ${name.value.trim()}`,
     content: [
       element("p", {}, "On the other host: Settings, Hosts, Add a host. There, enter:"),
-      facts([
+      factList([
         ["Address", ownAddress(location) ?? "this host's name or address in your network"],
         ["Port", new URL(secureAddress()).port || "443"],
       ]),
@@ -43,9 +44,4 @@ export async function showCode(host: HTMLElement, hosts: Hosts): Promise<void> {
 
 function groups(code: string): HTMLElement[] {
   return code.split("-").map((group) => element("span", {}, group));
-}
-
-function facts(pairs: readonly (readonly [string, string])[]): HTMLElement {
-  const parts = pairs.map(([label, text]) => element("div", {}, element("dt", {}, label), element("dd", {}, text)));
-  return element("dl", { class: "mount-facts" }, ...parts);
 }

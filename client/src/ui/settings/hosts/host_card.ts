@@ -18,20 +18,20 @@ export interface HostCard {
 export function hostCard(record: HostRecord, onRemove: () => void): HostCard {
   const { name, address, port, enabled } = record;
   const state = element("span", { class: "quiet" }, stateText(record));
-  const trouble = element("p", { class: "mount-trouble" });
+  const trouble = element("p", { class: "record-trouble" });
   trouble.hidden = true;
   const remove = button("Remove…", onRemove);
   remove.setAttribute("aria-label", `Remove ${name}…`);
   const gap = element("span", { class: "bar-gap" });
-  const head = element("header", { class: "mount-head" }, element("h3", {}, name), state, gap, remove);
-  const where = address ? [element("p", { class: "quiet mount-path" }, `${address}, port ${port}`)] : [];
-  const root = element("li", { class: "mount-card" }, head, ...where, trouble, ...cameras(record));
+  const head = element("header", { class: "record-head" }, element("h3", {}, name), state, gap, remove);
+  const where = address ? [element("p", { class: "quiet record-place" }, `${address}, port ${port}`)] : [];
+  const root = element("li", { class: "record-card" }, head, ...where, trouble, ...cameras(record));
   return {
     root,
     showState(reason) {
       if (!enabled) return;
       state.textContent = reason ? "does not answer" : "answers";
-      state.className = reason ? "mount-trouble" : "quiet";
+      state.className = reason ? "record-trouble" : "quiet";
       trouble.textContent = reason ? `${reason.charAt(0).toUpperCase()}${reason.slice(1)}.` : "";
       trouble.hidden = reason === "";
     },

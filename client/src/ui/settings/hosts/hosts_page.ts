@@ -57,7 +57,7 @@ export class HostsPage extends LoadedPage<HostList> {
     const sentence =
       "No other host yet. To show cameras that another host records, have that host show a code, and add it here.";
     if (server.length === 0) return this.show(emptyState("hosts", sentence, button("Add a host", () => void this.#add(), "primary")));
-    const hint = shown.length > 0 && !centralManagement ? [element("p", { class: "mount-trouble" }, kOff, systemLink(), ".")] : [];
+    const hint = shown.length > 0 && !centralManagement ? [element("p", { class: "record-trouble" }, kOff, systemLink(), ".")] : [];
     this.show(
       ...hint,
       ...this.#group("Their cameras are shown here", shown),
