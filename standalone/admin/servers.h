@@ -75,8 +75,8 @@ class RemovesDenials : public std::runtime_error {
     ServerLoss loss_;
 };
 
-// A server is known by that name whose certificate is another one, and users are denied something of it. Were the new one
-// stored, they would be denied what has the same ids there, and nothing of the old one.
+// A server is known by that name whose certificate is another one, and users are denied something of it. Were the new
+// one stored, they would be denied what has the same ids there, and nothing of the old one.
 class MovesDenials : public std::runtime_error {
   public:
     explicit MovesDenials(ServerLoss loss)
