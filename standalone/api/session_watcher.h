@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The process beside the host that asks the store which sessions have ended elsewhere (run out, password changed, account
-// denied or removed), which pairings have, and whether something was reported, which wakes VEXO.Event Watch.
+// The process beside the host that asks the store which sessions have ended elsewhere (run out, password changed,
+// account denied or removed), which pairings have, and whether something was reported, which wakes VEXO.Event Watch.
 #pragma once
 
 #include <cstdint>
@@ -24,8 +24,9 @@ class PurgeSchedule {
     std::int64_t pause_s_ = 0;
 };
 
-// Marks the slots of ended sessions and pairings in the table, and notes there what was reported, twice a second, until the process is killed; hands the host's filter
-// the store's session key at first. A store that fails is tried again. Runs in a process of its own.
+// Twice a second, until the process is killed: marks the slots of ended sessions and pairings in the table, and notes
+// there what was reported. Hands the host's filter the store's session key at first. A store that fails is tried again.
+// Runs in a process of its own.
 [[noreturn]] void WatchSessions(const base::Installation& installation, control::SlotTable& slots,
                                 SessionFilter& filter);
 
