@@ -34,7 +34,7 @@ await visit(async (page, complaints) => {
     await report(`at ${rate}`, { samples: await samples(), rate: await page.locator(".rate option:checked").textContent() });
   }
 
-  // The leading picture alone, and so little time that the recordings fill the timeline.
+  // The active picture alone, and so little time that the recordings fill the timeline.
   await page.keyboard.press("Enter");
   for (let press = 0; press < 12; press += 1) await page.locator(".timeline-lanes").press("+");
   const axis = await page.locator(".timeline-axis").boundingBox();

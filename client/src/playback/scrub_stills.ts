@@ -3,7 +3,7 @@
 // The pictures of a playhead that is dragged: of each camera the newest that was asked for, and few requests at once.
 //
 // Why so        A pointer asks for sixty times a second, and each picture is a process on the server. What was not
-//               begun before the next time was asked for is never fetched. The leading camera comes first; the others
+//               begun before the next time was asked for is never fetched. The active camera comes first; the others
 //               get theirs when the pointer rests. Pictures that come in another order are left out, so that they only
 //               go the way of the pointer. A picture is that of a key frame, which stands for every time until the one
 //               it was asked for: within seconds of H.264 nothing more is fetched.
@@ -53,7 +53,7 @@ export class ScrubStills {
     this.#show = show;
   }
 
-  /** Asks for one time of several cameras, the leading one first. */
+  /** Asks for one time of several cameras, the active one first. */
   request(wanted: readonly ScrubRequest[]): void {
     this.#wanted = [...wanted];
     this.#pump();

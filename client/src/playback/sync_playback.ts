@@ -4,7 +4,7 @@
 //
 // Why so        Recordings of a camera follow each other without a gap, or with hours between. One clock says which
 //               moment is shown; a camera that has nothing then joins as soon as it has. Where none has anything, the
-//               clock goes on to whatever comes next on any camera. One player leads: steps are frames of its camera,
+//               clock goes on to whatever comes next on any camera. One camera is active: steps are frames of it,
 //               and a pause shows what each camera had at the time of its picture.
 
 import type { Footage } from "../wire/footage";
@@ -23,7 +23,7 @@ export class SyncPlayback {
   readonly #changed: () => void;
   readonly #skipped: (seconds: number) => void;
   readonly #tracks: Tracks;
-  #lead: Track | null = null;
+  #active: Track | null = null;
   #playheadMs: number | null = null;
   #isPlaying = false;
   #isScrubbed = false;
@@ -45,8 +45,8 @@ export class SyncPlayback {
     return this.#tracks.all;
   }
 
-  get lead(): Track | null {
-    return this.#lead;
+  get active(): Track | null {
+    return this.#active;
   }
 
   /** Unix milliseconds of what is shown; null before anything is. */
@@ -75,13 +75,13 @@ export class SyncPlayback {
   /** Plays these cameras; those that stay play on, and the players of the others end. */
   setCameras(cameras: readonly number[]): void {
     const added = this.#tracks.setCameras(cameras);
-    this.#lead = this.#tracks.of(this.#lead?.camera) ?? this.tracks[0] ?? null;
+    this.#active = this.#tracks.of(this.#active?.camera) ?? this.tracks[0] ?? null;
     for (const track of added) this.#join(track, this.#isPlaying);
     this.#changed();
   }
 
-  setLead(camera: number): void {
-    this.#lead = this.#tracks.of(camera) ?? this.#lead;
+  setActive(camera: number): void {
+    this.#active = this.#tracks.of(camera) ?? this.#active;
     this.#changed();
   }
 
@@ -89,20 +89,20 @@ export class SyncPlayback {
   open(footage: Footage, atMs = footage.start * 1000, isPlaying = true): void {
     const track = this.#tracks.of(footage.camera);
     if (!track) return;
-    this.#lead = track;
+    this.#active = track;
     this.#goTo(atMs, isPlaying);
     this.#tracks.start(track, footage, atMs, isPlaying);
     for (const other of this.tracks) if (other !== track) this.#join(other, isPlaying);
     this.#changed();
   }
 
-  /** Goes to a time of all cameras, of which `camera` leads; in a mark that is played, where it has that time. */
-  seek(atMs: number, camera = this.#lead?.camera, isPlaying = this.#isPlaying): void {
-    const current = this.#lead?.player.footage;
+  /** Goes to a time of all cameras; `camera` becomes active. Within a mark that is played, where it has that time. */
+  seek(atMs: number, camera = this.#active?.camera, isPlaying = this.#isPlaying): void {
+    const current = this.#active?.player.footage;
     const isInMark = current && current.kind !== "event" && current.camera === camera && covers(current, atMs);
     const wanted = isInMark ? current : camera === undefined ? null : this.#lookup.at(camera, atMs);
     if (wanted) return this.open(wanted, atMs, isPlaying);
-    this.#lead = this.#tracks.of(camera) ?? this.#lead;
+    this.#active = this.#tracks.of(camera) ?? this.#active;
     const hasAny = this.tracks.some((track) => this.#lookup.at(track.camera, atMs));
     this.#goTo(atMs, isPlaying && hasAny);
     for (const track of this.tracks) this.#join(track, this.#isPlaying);
@@ -122,8 +122,8 @@ export class SyncPlayback {
   play(): void {
     const atMs = this.#playheadMs;
     if (atMs === null) return;
-    const lead = this.#lead?.player;
-    const ended = lead?.state.kind === "ended" ? lead.footage : null;
+    const active = this.#active?.player;
+    const ended = active?.state.kind === "ended" ? active.footage : null;
     this.#goTo(atMs, true);
     for (const track of this.tracks) {
       if (track.player.state.kind === "ended") void this.#goOn(track, false);
@@ -139,10 +139,10 @@ export class SyncPlayback {
     this.#changed();
   }
 
-  /** Pauses, and moves by frames of the leading camera. */
+  /** Pauses, and moves by frames of the active camera. */
   step(by: number): void {
     if (this.#isPlaying) this.pause();
-    this.#lead?.player.step(by);
+    this.#active?.player.step(by);
   }
 
   setRate(rate: number): void {
@@ -157,7 +157,7 @@ export class SyncPlayback {
   tick(): void {
     if (!this.#isPlaying) return;
     const atMs = this.#tracks.clock.atMs;
-    if (this.#lead?.player.state.kind !== "playing") this.#playheadMs = atMs;
+    if (this.#active?.player.state.kind !== "playing") this.#playheadMs = atMs;
     void this.#lookup.load(this.#tracks.cameras, atMs);
     for (const track of this.tracks) {
       const { state, footage } = track.player;
@@ -177,9 +177,9 @@ export class SyncPlayback {
     this.#tracks.close();
   }
 
-  /** Of what is still being recorded, the cache does not know the end yet: what leads is opened again all the same. */
+  /** The cache does not know the end of what is still being recorded, so the active camera's is opened again anyway. */
   #reopen(atMs: number): void {
-    const { footage, state } = this.#lead?.player ?? {};
+    const { footage, state } = this.#active?.player ?? {};
     if (footage?.isGrowing && state && kActive.includes(state.kind)) this.open(footage, atMs);
     else this.seek(atMs);
   }
@@ -194,7 +194,7 @@ export class SyncPlayback {
 
   #follow(track: Track): void {
     const { state, timeMs, positionMs, footage, rate } = track.player;
-    if (track === this.#lead && footage && !this.#isScrubbed) {
+    if (track === this.#active && footage && !this.#isScrubbed) {
       if (state.kind === "playing") this.#playheadMs = positionMs;
       if (state.kind === "paused") this.#playheadMs = timeMs;
       if (state.kind === "paused" && !this.#isPlaying) this.#alignOthers();
@@ -210,7 +210,7 @@ export class SyncPlayback {
 
   #alignOthers(): void {
     for (const other of this.tracks) {
-      if (other === this.#lead || this.#playheadMs === null) continue;
+      if (other === this.#active || this.#playheadMs === null) continue;
       if (this.#joined.get(other)?.atMs !== this.#playheadMs) this.#join(other, false);
     }
   }
@@ -239,7 +239,7 @@ export class SyncPlayback {
   /** Plays what follows a recording that has ended. A mark is played by itself: with `mayStop` its end is a pause. */
   async #goOn(track: Track, mayStop: boolean): Promise<void> {
     const ended = track.player.footage;
-    if (ended?.kind !== "event") return mayStop && track === this.#lead ? this.pause() : undefined;
+    if (ended?.kind !== "event") return mayStop && track === this.#active ? this.pause() : undefined;
     this.#tracks.awaitNext(track);
     const next = await this.#lookup.following(ended);
     const isWanted = this.#isPlaying && this.tracks.includes(track) && track.player.footage === ended;
@@ -257,7 +257,7 @@ export class SyncPlayback {
       const [generation, fromMs, ended] = [this.#generation, this.#tracks.clock.atMs, this.#tracks.ended];
       const ends = ended.map(({ stop }) => stop).filter((stop) => stop * 1000 <= fromMs + kEndToleranceMs);
       const fromS = Math.max(fromMs / 1000, ...ends);
-      const current = this.#lead?.player.footage ?? ended[0] ?? null;
+      const current = this.#active?.player.footage ?? ended[0] ?? null;
       // After a mark nothing follows by itself.
       const isMark = current !== null && current.kind !== "event";
       const next = isMark ? null : await this.#lookup.next(this.#tracks.cameras, fromS, current);

@@ -44,7 +44,7 @@ describe("the stills of a dragged playhead", () => {
     expect(shown).toEqual([[1, 2], [1, 3]]);
   });
 
-  test("the leading camera comes first; one that has nothing then says so at once", async () => {
+  test("the active camera comes first; one that has nothing then says so at once", async () => {
     for (const atMs of [1, 2, 3]) request(atMs);
     stills.request([
       { camera: 1, footage, atMs: 4, widthPx: 320 },

@@ -78,7 +78,7 @@ export class EventsJumps {
     this.#towardsMs = null;
     if (isLeaving) this.#leaving();
     this.#overview.timeline.reveal(atMs);
-    this.#playback.seek(atMs, this.#stage.lead ?? undefined, isPlaying);
+    this.#playback.seek(atMs, this.#stage.active ?? undefined, isPlaying);
   }
 
   /** Asks for a time in a dialog, which goes away with `host`. */
@@ -101,7 +101,7 @@ export class EventsJumps {
     const atMs = footage ? footage.moment * 1000 : this.#playback.playheadMs;
     if (atMs === null) return;
     const listed = this.#overview.filter.cameras.map(({ id }) => id);
-    const first = footage?.camera ?? this.#stage.lead ?? listed[0];
+    const first = footage?.camera ?? this.#stage.active ?? listed[0];
     if (first === undefined) return;
     const all = [...new Set([first, ...listed, ...this.#overview.cameras.map(({ id }) => id)])].slice(0, kMaxLookedUp);
     await this.#overview.cache.load(all, atMs / 1000 - 1, atMs / 1000 + 1);

@@ -30,7 +30,7 @@ export interface EventsActions extends TransportActions {
   /** To the next slower (-1) or faster (1) rate. */
   changeRate(by: 1 | -1): void;
   layout(layout: StageLayout): void;
-  /** Shows the leading camera alone, or all again; false where there is but one. */
+  /** Shows the active camera alone, or all again; false where there is but one. */
   enlarge(): boolean;
   /** Closes what was opened last, export or large picture; false where nothing was. */
   back(): boolean;

@@ -15,7 +15,7 @@ import { clockTime, preciseTime, shortDate } from "../widgets/text";
 export interface PlayerTileActions {
   /** Plays what has stopped. */
   again(): void;
-  /** The tile was clicked: its camera leads. */
+  /** The tile was clicked: its camera becomes active. */
   choose(): void;
   /** Shows it large, or all again; false where it is the only one. */
   enlarge(): boolean;
@@ -70,8 +70,8 @@ export class PlayerTile {
     this.#large.setAttribute("aria-pressed", String(isLarge));
   }
 
-  set isLead(isLead: boolean) {
-    this.root.classList.toggle("is-lead", isLead);
+  set isActive(isActive: boolean) {
+    this.root.classList.toggle("is-active", isActive);
   }
 
   /** `playheadMs` is named where nothing was recorded then. */

@@ -26,7 +26,7 @@ export class Scrubbing {
   /** Plays from there. */
   release(atMs: number): void {
     this.close();
-    this.#playback.seek(atMs, this.#stage.lead ?? undefined, true);
+    this.#playback.seek(atMs, this.#stage.active ?? undefined, true);
   }
 
   close(): void {

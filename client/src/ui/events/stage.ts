@@ -50,8 +50,8 @@ export class Stage {
   }
 
   /** The one that is dragged, enlarged and stepped through. */
-  get lead(): number | null {
-    return this.#large ?? this.#playback.lead?.camera ?? null;
+  get active(): number | null {
+    return this.#large ?? this.#playback.active?.camera ?? null;
   }
 
   show(plan: StagePlan, large: number | null = null): void {
@@ -63,19 +63,19 @@ export class Stage {
   }
 
   setLayout(layout: StageLayout): void {
-    this.show(withLayout(this.#plan, layout, this.lead, this.maxPlayers));
+    this.show(withLayout(this.#plan, layout, this.active, this.maxPlayers));
   }
 
-  /** Gives the camera a player in the layout as it is; the leading camera makes room where there is none. */
+  /** Gives the camera a player in the layout as it is; the active camera makes room where there is none. */
   include(camera: number): void {
     if (this.cameras.includes(camera)) return;
-    this.show(showing(this.#plan, camera, this.lead, this.maxPlayers));
+    this.show(showing(this.#plan, camera, this.active, this.maxPlayers));
   }
 
-  /** Adds the camera, in place of the leading one where no player is left, or closes it unless it is the only one. */
+  /** Adds the camera, in place of the active one where no player is left, or closes it unless it is the only one. */
   toggle(camera: number): void {
     if (this.cameras.includes(camera)) return this.remove(camera);
-    this.show(withCamera(this.#plan, camera, this.maxPlayers) ?? showing(this.#plan, camera, this.lead, this.maxPlayers));
+    this.show(withCamera(this.#plan, camera, this.maxPlayers) ?? showing(this.#plan, camera, this.active, this.maxPlayers));
   }
 
   remove(camera: number): void {
@@ -83,10 +83,10 @@ export class Stage {
   }
 
   /** Shows a camera alone, or all again. False where there is but one cell. */
-  enlarge(camera: number | null = this.lead): boolean {
+  enlarge(camera: number | null = this.active): boolean {
     if (this.#plan.layout === 1 || camera === null) return false;
     this.#large = this.#large === null ? camera : null;
-    if (this.#large !== null) this.#playback.setLead(camera);
+    if (this.#large !== null) this.#playback.setActive(camera);
     this.#arrange();
     this.#changed();
     return true;
@@ -94,15 +94,15 @@ export class Stage {
 
   refresh(): void {
     for (const [camera, tile] of this.#tiles) {
-      tile.isLead = this.cameras.length > 1 && camera === this.lead;
+      tile.isActive = this.cameras.length > 1 && camera === this.active;
       tile.refresh(this.#playback.playheadMs);
     }
   }
 
-  /** What is to be fetched for a time: first of the picture that leads. */
+  /** What is to be fetched for a time: the active camera first. */
   stillsAt(atMs: number, find: (camera: number) => Footage | null): ScrubRequest[] {
     const cameras = this.#large === null ? this.cameras : [this.#large];
-    const order = [...cameras].sort((one, other) => Number(other === this.lead) - Number(one === this.lead));
+    const order = [...cameras].sort((one, other) => Number(other === this.active) - Number(one === this.active));
     return order.map((camera) => {
       const widthPx = this.#tiles.get(camera)?.widthPx ?? 0;
       const width = kStillWidths.find((each) => each >= widthPx) ?? kStillWidths.at(-1)!;
@@ -138,7 +138,7 @@ export class Stage {
     const name = this.#cameras.find(({ id }) => id === camera)?.name ?? `Camera ${camera}`;
     return new PlayerTile(name, player, {
       again: () => this.#playback.play(),
-      choose: () => this.#playback.setLead(camera),
+      choose: () => this.#playback.setActive(camera),
       enlarge: () => this.enlarge(camera),
       close: () => this.remove(camera),
     });

@@ -100,8 +100,8 @@ export class Transport {
   }
 
   refresh(): void {
-    const { isPlaying, lead, playheadMs, rate } = this.#playback;
-    const footage = lead?.player.footage ?? null;
+    const { isPlaying, active, playheadMs, rate } = this.#playback;
+    const footage = active?.player.footage ?? null;
     this.#play.setAttribute("aria-label", isPlaying ? "Pause" : "Play");
     this.#play.title = `${isPlaying ? "Pause" : "Play"} (Space)`;
     this.root.dataset["playing"] = String(isPlaying);
@@ -110,9 +110,9 @@ export class Transport {
     this.#name(this.#before, "Previous event", this.#walk.peek(-1), "↑");
     this.#name(this.#after, "Next event", this.#walk.peek(1), "↓");
     this.#growing.hidden = !footage?.isGrowing;
-    const frameCount = lead?.player.frameCount ?? 0;
+    const frameCount = active?.player.frameCount ?? 0;
     const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
-    setText(this.#frame, footage ? `frame ${(lead?.player.index ?? 0) + 1}${frames}` : "");
+    setText(this.#frame, footage ? `frame ${(active?.player.index ?? 0) + 1}${frames}` : "");
     this.#keeping.show(footage);
     if (footage) this.#download.href = downloadAddress(footage);
     else this.#download.removeAttribute("href");

@@ -147,7 +147,7 @@ export class EventsScreen extends Screen {
   #toggleExport(): void {
     if (this.#closeExport()) return;
     const atMs = this.#playback.playheadMs ?? Date.now();
-    const footage = this.#playback.lead?.player.footage ?? null;
+    const footage = this.#playback.active?.player.footage ?? null;
     this.#layout.choose("timeline");
     this.#overview.timeline.reveal(footage ? footage.start * 1000 : atMs);
     this.#export.open(this.#overview.filter.cameras, this.#stage.cameras, footage, atMs);
@@ -204,7 +204,7 @@ export class EventsScreen extends Screen {
     // Back from what is being played ends it.
     if (!wanted && atMs === null) return this.#playback.close();
     if (!wanted) return this.#jumps.to(atMs!, false);
-    if (atMs === null && isSameFootage(wanted, this.#playback.lead?.player.footage)) return;
+    if (atMs === null && isSameFootage(wanted, this.#playback.active?.player.footage)) return;
     const footage = await this.#recordings.find(wanted);
     if (!isWanted()) return;
     // An address that names a time leads to the picture of it.
@@ -225,7 +225,7 @@ export class EventsScreen extends Screen {
   }
 
   #showPlayback(): void {
-    const footage = this.#playback.lead?.player.footage ?? null;
+    const footage = this.#playback.active?.player.footage ?? null;
     this.#stage.refresh();
     this.#transport.refresh();
     this.#overview.showPlayback(footage, this.#playback.playheadMs, this.#playback.isPlaying);
@@ -233,7 +233,7 @@ export class EventsScreen extends Screen {
     this.#recordShown();
   }
 
-  /** Back shall lead to the very picture that is left. */
+  /** So that Back returns to exactly the picture that is left. */
   #leaveMoment(): void {
     this.#recordShown(true);
     this.#isNewEntry = true;
@@ -241,10 +241,10 @@ export class EventsScreen extends Screen {
 
   /** The address leads to what is shown, to the frame where a picture stands still. */
   #recordShown(isAtOnce = false): void {
-    const { playheadMs, lead, isPlaying, isScrubbed } = this.#playback;
+    const { playheadMs, active, isPlaying, isScrubbed } = this.#playback;
     if (playheadMs === null || isScrubbed || this.#isFollowing) return;
     const { plan, large } = this.#stage;
-    const footage = lead?.player.footage ?? null;
+    const footage = active?.player.footage ?? null;
     const address = { footage, atMs: playheadMs, stage: { plan, large }, filter: this.#overview.choice };
     recordEventsAddress(address, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
     this.#isNewEntry = false;
@@ -272,7 +272,7 @@ export class EventsScreen extends Screen {
     const cameras = filter.cameras.map(({ id }) => id);
     if (cameras.length === 0) return null;
     const kinds = [...filter.kinds];
-    const footage = this.#playback.lead?.player.footage;
+    const footage = this.#playback.active?.player.footage;
     if (footage) return { cameras, kinds, atS: footage.start, id: footage.id };
     return { cameras, kinds, atS: Math.floor((this.#playback.playheadMs ?? Date.now()) / 1000) };
   }

@@ -14,10 +14,10 @@ describe("the cells of the stage", () => {
     ["one that is there stays where it is", withCamera(four, 3, 9), 2, [1, null, 3, null]],
     ["the layout grows where there is no empty cell", withCamera(planOf(1, [1], 9), 2, 9), 2, [1, 2, null, null]],
     ["but holds no more than may be played", withCamera(full, 5, 4), 0, []],
-    ["an event's camera takes the place of the one that leads", showing(full, 5, 3, 4), 2, [1, 2, 5, 4]],
+    ["an event's camera takes the place of the active one", showing(full, 5, 3, 4), 2, [1, 2, 5, 4]],
     ["or an empty cell", showing(four, 5, 3, 9), 2, [1, 5, 3, null]],
     ["a cell is emptied, the others stay in place", withoutCamera(four, 1), 2, [null, null, 3, null]],
-    ["a smaller layout keeps the first, and the one that leads", withLayout(nine, 2, 5, 9), 2, [1, 2, 3, 5]],
+    ["a smaller layout keeps the first, and the active one", withLayout(nine, 2, 5, 9), 2, [1, 2, 3, 5]],
     ["a larger one keeps the order", withLayout(four, 3, null, 9), 3, [1, 3, null, null, null, null, null, null, null]],
   ])("%s", (_, plan, layout, cells) => {
     expect(plan ?? { layout: 0, cells: [] }).toEqual({ layout, cells });
