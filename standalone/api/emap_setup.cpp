@@ -70,7 +70,7 @@ emap::MapPicture DrawnPicture(const Call& call) {
                       http::kRetrySoonSeconds);
     }
     call.context.CloseRecords();
-    return emap::MapPicture::Redrawn(call.request.body, [&call] {
+    return emap::MapPicture::Reencoded(call.request.body, [&call] {
         call.slots.KeepOnly(call.slot);
         binding::ReleaseCommonRecord();
     });

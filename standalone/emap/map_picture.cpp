@@ -34,7 +34,7 @@ namespace lookhaven::emap {
 namespace {
 
 using Clock = std::chrono::steady_clock;
-using Outcome = media::Redrawn::Outcome;
+using Outcome = media::Reencoded::Outcome;
 
 constexpr Outcome kFailed{'x'};  // no fault of the file's
 
@@ -66,7 +66,7 @@ void WriteLetter(Outcome outcome) {
 }
 
 // Writes the outcome's letter and the file to standard output. What is open beside that and the log is closed.
-void RedrawConfined(std::string_view type, std::string_view file, const std::function<void()>& confine) {
+void ReencodeConfined(std::string_view type, std::string_view file, const std::function<void()>& confine) {
     const media::DecoderLibrary& library = media::LoadDecoderLibrary();
     base::PreferAsOomVictim();
     ::close(STDIN_FILENO);
@@ -80,15 +80,15 @@ void RedrawConfined(std::string_view type, std::string_view file, const std::fun
         confine();
     }
     media::EnterStillSandbox();
-    const media::Redrawn redrawn =
-        library.Redraw(type, {reinterpret_cast<const std::uint8_t*>(file.data()), file.size()}, kMaxPictureBytes);
-    WriteLetter(redrawn.outcome);
-    Write(redrawn.file);
+    const media::Reencoded reencoded =
+        library.Reencode(type, {reinterpret_cast<const std::uint8_t*>(file.data()), file.size()}, kMaxPictureBytes);
+    WriteLetter(reencoded.outcome);
+    Write(reencoded.file);
 }
 
-void RunRedraw(std::string_view type, std::string_view file, const std::function<void()>& confine) {
+void RunReencode(std::string_view type, std::string_view file, const std::function<void()>& confine) {
     try {
-        RedrawConfined(type, file, confine);
+        ReencodeConfined(type, file, confine);
     } catch (const std::bad_alloc&) {
         // Nothing is written, as where the kernel ends the process.
     } catch (const std::exception& error) {
@@ -119,7 +119,7 @@ std::string ReadOutcome(int input) {
 }
 
 // What the process that decodes the file says of it.
-std::string RedrawApart(std::string_view type, std::string_view file, const std::function<void()>& confine) {
+std::string ReencodeInSandbox(std::string_view type, std::string_view file, const std::function<void()>& confine) {
     std::array<int, 2> ends{};
     if (::pipe2(ends.data(), O_CLOEXEC) != 0) {
         base::ThrowErrno("cannot make a pipe");
@@ -135,7 +135,7 @@ std::string RedrawApart(std::string_view type, std::string_view file, const std:
         ::prctl(PR_SET_PDEATHSIG, SIGKILL);
         ::dup2(output.Get(), STDOUT_FILENO);
         if (::getppid() == parent) {
-            RunRedraw(type, file, confine);
+            RunReencode(type, file, confine);
         }
         ::_exit(0);
     }
@@ -149,7 +149,7 @@ std::string RedrawApart(std::string_view type, std::string_view file, const std:
 
 }  // namespace
 
-MapPicture MapPicture::Redrawn(std::string_view file, const std::function<void()>& confine) {
+MapPicture MapPicture::Reencoded(std::string_view file, const std::function<void()>& confine) {
     if (file.size() > kMaxUploadBytes) {
         throw store::InvalidRecord("an e-map's picture has at most 20 MiB");
     }
@@ -160,7 +160,7 @@ MapPicture MapPicture::Redrawn(std::string_view file, const std::function<void()
     if (type.empty()) {
         throw store::InvalidRecord("an e-map's picture is a PNG, JPEG or WebP file");
     }
-    std::string outcome = RedrawApart(type, file, confine);
+    std::string outcome = ReencodeInSandbox(type, file, confine);
     if (outcome.starts_with(static_cast<char>(kFailed))) {
         throw std::system_error(std::make_error_code(std::errc::io_error), "pictures cannot be decoded");
     }
@@ -182,7 +182,7 @@ MapPicture MapPicture::OfOperator(std::string_view file) {
     if (type.empty()) {
         throw store::InvalidRecord("an e-map's picture is a PNG, JPEG, WebP or SVG file");
     }
-    return type == "svg" ? MapPicture(std::string(file)) : Redrawn(file);
+    return type == "svg" ? MapPicture(std::string(file)) : Reencoded(file);
 }
 
 }  // namespace lookhaven::emap

@@ -24,9 +24,9 @@ class MapPicture {
     // open, in a process with one thread. confine: gives up, in the new process, what it got from this one beside
     // descriptors, which are closed. Throws store::InvalidRecord, which says what is wrong with the file,
     // std::system_error where no process can decode it.
-    static MapPicture Redrawn(std::string_view file, const std::function<void()>& confine = {});
+    static MapPicture Reencoded(std::string_view file, const std::function<void()>& confine = {});
 
-    // As Redrawn, but takes an SVG file as it is: of someone who could write the state folder as well.
+    // As Reencoded, but takes an SVG file as it is: of someone who could write the state folder as well.
     static MapPicture OfOperator(std::string_view file);
 
     const std::string& File() const { return file_; }

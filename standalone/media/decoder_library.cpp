@@ -28,8 +28,9 @@ class Library : public DecoderLibrary {
     std::vector<std::uint8_t> Shrink(std::span<const std::uint8_t> jpeg, int width) const override {
         return ShrinkJpeg(jpeg, width);
     }
-    Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) const override {
-        return media::Redraw(type, file, max_bytes);
+    Reencoded Reencode(std::string_view type, std::span<const std::uint8_t> file,
+                       std::size_t max_bytes) const override {
+        return media::Reencode(type, file, max_bytes);
     }
     std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const override {
         return OpenFrameDecoder(VideoCodecNamed(codec), threads);

@@ -19,7 +19,7 @@
 #include <vector>
 
 #include "standalone/media/join.h"
-#include "standalone/media/redraw.h"
+#include "standalone/media/reencode.h"
 #include "standalone/media/remux.h"
 
 namespace lookhaven::media {
@@ -53,8 +53,9 @@ class DecoderLibrary {
                                             std::size_t max_bytes) const = 0;
     // As ShrinkJpeg in jpeg_scaler.h.
     virtual std::vector<std::uint8_t> Shrink(std::span<const std::uint8_t> jpeg, int width) const = 0;
-    // As Redraw in redraw.h.
-    virtual Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) const = 0;
+    // As Reencode in reencode.h.
+    virtual Reencoded Reencode(std::string_view type, std::span<const std::uint8_t> file,
+                               std::size_t max_bytes) const = 0;
     // Each thread beyond the first delays pictures by one more frame, so use one thread at the end of a growing
     // recording. Throws SourceError for a codec that cannot be decoded.
     virtual std::unique_ptr<FrameDecoder> OpenDecoder(std::string_view codec, int threads) const = 0;

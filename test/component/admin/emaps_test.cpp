@@ -33,10 +33,10 @@ TEST_P(EmapAdminTest, AreAuditedWhoeverMakesThem) {
     EXPECT_EQ(emap::Pictures(store_, folder_).Read(added.image), "<svg/>");
     const Emap renamed = SetEmap(store_, {}, folder_, added.id, added.revision, {.name = "Court", .small_items = true});
     EXPECT_EQ(renamed.image, added.image);
-    const Emap redrawn = SetEmap(store_, ada, folder_, added.id, renamed.revision, {.picture = drawing_});
-    EXPECT_NE(redrawn.image, added.image) << "a browser must not show the last one";
-    EXPECT_EQ(redrawn.name, "Court");
-    SetEmap(store_, ada, folder_, added.id, redrawn.revision, {.name = "Court"});
+    const Emap replaced = SetEmap(store_, ada, folder_, added.id, renamed.revision, {.picture = drawing_});
+    EXPECT_NE(replaced.image, added.image) << "a browser must not show the last one";
+    EXPECT_EQ(replaced.name, "Court");
+    SetEmap(store_, ada, folder_, added.id, replaced.revision, {.name = "Court"});
     PlaceItems(store_, ada, *emaps_.Find(added.id), {{.type = store::EmapItemType::kEmap, .device_id = added.id}});
     RemoveEmap(store_, ada, folder_, added.id, {});
     EXPECT_THAT(Audited(),

@@ -48,7 +48,7 @@ class EmapSetup : public testing::Test {
     const std::string png_ = Png(40, 30, {250, 10, 10});
 };
 
-TEST_F(EmapSetup, AMapIsAddedRenamedRedrawnAndRemoved) {
+TEST_F(EmapSetup, AMapIsAddedChangedAndRemoved) {
     const Answer added = Upload("Add&name=Ground%20floor", png_);
     ASSERT_EQ(added.status, 200) << added.body;
     const Json::Value map = added.Json()["data"]["emap"];
@@ -60,9 +60,9 @@ TEST_F(EmapSetup, AMapIsAddedRenamedRedrawnAndRemoved) {
     EXPECT_EQ(linked["linkedFrom"][0]["name"], "2");
     EXPECT_EQ(List()[1]["items"], 1);
     EXPECT_EQ(Ask("Emap&method=Rename", R"({"emap": 1, "name": "Yard", "revision": )" + Seen(1) + "}").status, 200);
-    const Answer redrawn = Upload("Picture&emap=1&revision=" + Seen(1), png_);
-    EXPECT_EQ(redrawn.Json()["data"]["emap"]["name"], "Yard") << redrawn.body;
-    EXPECT_NE(redrawn.Json()["data"]["emap"]["picture"], map["picture"]);
+    const Answer replaced = Upload("Picture&emap=1&revision=" + Seen(1), png_);
+    EXPECT_EQ(replaced.Json()["data"]["emap"]["name"], "Yard") << replaced.body;
+    EXPECT_NE(replaced.Json()["data"]["emap"]["picture"], map["picture"]);
     const Answer stale = Ask("Emap&method=Remove", R"({"emap": 1, "revision": )" + map["revision"].asString() + "}");
     EXPECT_EQ(stale.status, 409);
     EXPECT_EQ(stale.Json()["error"]["data"], List()[0]) << "as it is now, and what shows it";

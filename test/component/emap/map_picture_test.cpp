@@ -90,11 +90,11 @@ std::string Exif(int orientation, bool is_big_endian) {
 TEST(MapPicture, KeepsThePixelsOfAPngAndNothingElse) {
     const std::string secret = PngChunk("tEXt", std::string("Comment\0secret", 14)) +
                                PngChunk("zTXt", std::string("Comment\0\0", 9) + Stored("secret"));
-    const std::string file = MapPicture::Redrawn(Png(40, 30, kRed, secret) + "secret").File();
+    const std::string file = MapPicture::Reencoded(Png(40, 30, kRed, secret) + "secret").File();
     EXPECT_EQ(PictureType(file), "png");
     EXPECT_EQ(file.substr(16, 8), BigEndian(40) + BigEndian(30));
     EXPECT_THAT(file, Not(HasSubstr("secret")));
-    EXPECT_EQ(MapPicture::Redrawn(file).File(), file) << "and once more";
+    EXPECT_EQ(MapPicture::Reencoded(file).File(), file) << "and once more";
 }
 
 TEST(MapPicture, OfAJpegIsUpright) {
@@ -109,7 +109,7 @@ TEST(MapPicture, OfAJpegIsUpright) {
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.orientation);
-        const std::string file = MapPicture::Redrawn(Jpeg(Exif(row.orientation, row.orientation % 2 == 0))).File();
+        const std::string file = MapPicture::Reencoded(Jpeg(Exif(row.orientation, row.orientation % 2 == 0))).File();
         EXPECT_THAT(file, Not(HasSubstr("taken at home")));
         const Picture picture = ReadJpeg(file);
         ASSERT_EQ(picture.width, row.is_high ? 16 : 32);
@@ -120,7 +120,7 @@ TEST(MapPicture, OfAJpegIsUpright) {
 
 TEST(MapPicture, OfAWebpIsAPngWhereItMayBeTransparent) {
     const auto drawn = [](const char* base64) {
-        return std::string(PictureType(MapPicture::Redrawn(*base::FromBase64(base64)).File()));
+        return std::string(PictureType(MapPicture::Reencoded(*base::FromBase64(base64)).File()));
     };
     EXPECT_EQ(drawn("UklGRhoAAABXRUJQVlA4TA0AAAAvAAAAEAcQERGIiP4HAA=="), "png");
     EXPECT_EQ(drawn("UklGRiIAAABXRUJQVlA4IBYAAAAwAQCdASoBAAEADsD+JaQAA3AAAAAA"), "jpg");
@@ -156,13 +156,13 @@ TEST(MapPicture, IsRefusedWhereTheFileIsNoneOrMeansHarm) {
     for (const auto& row : rows) {
         SCOPED_TRACE(row.what);
         try {
-            MapPicture::Redrawn(row.file);
+            MapPicture::Reencoded(row.file);
             ADD_FAILURE() << "was taken";
         } catch (const store::InvalidRecord& error) {
             EXPECT_THAT(error.what(), HasSubstr(row.problem));
         }
     }
-    EXPECT_NO_THROW(MapPicture::Redrawn(whole_jpeg));
+    EXPECT_NO_THROW(MapPicture::Reencoded(whole_jpeg));
     EXPECT_EQ(MapPicture::OfOperator("<svg/>").File(), "<svg/>");
     EXPECT_THROW(MapPicture::OfOperator("hello"), store::InvalidRecord);
     EXPECT_THROW(MapPicture::OfOperator(png.substr(0, 60)), store::InvalidRecord);
@@ -170,9 +170,9 @@ TEST(MapPicture, IsRefusedWhereTheFileIsNoneOrMeansHarm) {
 
 TEST(MapPicture, IsDecodedByAProcessThatGaveUpWhatItWasTold) {
     bool gave_up_here = false;
-    MapPicture::Redrawn(Png(4, 3, kRed), [&] { gave_up_here = true; });
+    MapPicture::Reencoded(Png(4, 3, kRed), [&] { gave_up_here = true; });
     EXPECT_FALSE(gave_up_here);
-    EXPECT_THROW(MapPicture::Redrawn(Png(4, 3, kRed), [] { throw std::runtime_error("cannot"); }), std::system_error)
+    EXPECT_THROW(MapPicture::Reencoded(Png(4, 3, kRed), [] { throw std::runtime_error("cannot"); }), std::system_error)
         << "decodes nothing unconfined";
 }
 

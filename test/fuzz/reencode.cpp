@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Draws any bytes anew as each kind of picture: what comes of it is a picture of that kind, or nothing.
-#include "standalone/media/redraw.h"
+#include "standalone/media/reencode.h"
 
 #include <cstring>
 
@@ -12,17 +12,17 @@
 using namespace lookhaven;
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    using Outcome = media::Redrawn::Outcome;
+    using Outcome = media::Reencoded::Outcome;
     constexpr std::size_t kMaxBytes = std::size_t{1} << 20;
     const std::span<const std::uint8_t> file(data, size);
     const int orientation = media::OrientationOf(file);
     fuzz::Require(orientation >= 1 && orientation <= 8);
     for (const char* type : {"png", "jpg", "webp"}) {
-        const media::Redrawn redrawn = media::Redraw(type, file, kMaxBytes);
-        const bool is_picture = redrawn.outcome == Outcome::kPng || redrawn.outcome == Outcome::kJpeg;
-        fuzz::Require(is_picture != redrawn.file.empty() && redrawn.file.size() <= kMaxBytes);
-        if (redrawn.outcome == Outcome::kPng) {
-            fuzz::Require(std::memcmp(redrawn.file.data(), "\x89PNG\r\n\x1a\n", 8) == 0);
+        const media::Reencoded reencoded = media::Reencode(type, file, kMaxBytes);
+        const bool is_picture = reencoded.outcome == Outcome::kPng || reencoded.outcome == Outcome::kJpeg;
+        fuzz::Require(is_picture != reencoded.file.empty() && reencoded.file.size() <= kMaxBytes);
+        if (reencoded.outcome == Outcome::kPng) {
+            fuzz::Require(std::memcmp(reencoded.file.data(), "\x89PNG\r\n\x1a\n", 8) == 0);
         }
     }
     return 0;

@@ -12,10 +12,10 @@
 namespace lookhaven::media {
 
 // A picture of more is not decoded: one of four samples a pixel fits into libav's largest block.
-constexpr std::int64_t kMaxRedrawnPixels = 30'000'000;
-constexpr int kMaxRedrawnSidePixels = 16'384;
+constexpr std::int64_t kMaxReencodedPixels = 30'000'000;
+constexpr int kMaxReencodedSidePixels = 16'384;
 
-struct Redrawn {
+struct Reencoded {
     enum class Outcome : char {
         kPng = 'p',
         kJpeg = 'j',
@@ -30,6 +30,6 @@ struct Redrawn {
 // compression without transparency a JPEG as well. Any other becomes a PNG, or where that exceeds max_bytes and
 // nothing of it can be transparent, a JPEG. Starts no thread; takes up to 15 bytes and 0.2 µs a pixel.
 // Throws std::bad_alloc.
-Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes);
+Reencoded Reencode(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes);
 
 }  // namespace lookhaven::media

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/media/redraw.h"
+#include "standalone/media/reencode.h"
 
 #include <algorithm>
 #include <memory>
@@ -23,7 +23,7 @@ namespace lookhaven::media {
 
 namespace {
 
-using Outcome = Redrawn::Outcome;
+using Outcome = Reencoded::Outcome;
 
 constexpr int kQuality = 90;
 constexpr int kBytesPerPixel = 3;
@@ -46,13 +46,13 @@ Jpeg Own(tjhandle handle) {
 // What a picture that ends early is short of is a warning, and grey.
 void Check(const Jpeg& jpeg, int result) {
     if (result != 0 && tjGetErrorCode(jpeg.get()) != TJERR_WARNING) {
-        throw SourceError(std::string("cannot redraw a picture: ") + tjGetErrorStr2(jpeg.get()));
+        throw SourceError(std::string("cannot re-encode a picture: ") + tjGetErrorStr2(jpeg.get()));
     }
 }
 
 bool HasTooManyPixels(const PictureSize& size) {
-    return size.width > kMaxRedrawnSidePixels || size.height > kMaxRedrawnSidePixels ||
-           std::int64_t{size.width} * size.height > kMaxRedrawnPixels;
+    return size.width > kMaxReencodedSidePixels || size.height > kMaxReencodedSidePixels ||
+           std::int64_t{size.width} * size.height > kMaxReencodedPixels;
 }
 
 int Number(std::span<const std::uint8_t> file, std::size_t at, std::size_t bytes, bool is_big_endian) {
@@ -125,7 +125,7 @@ Pixels Turn(Pixels pixels, int orientation) {
     return upright;
 }
 
-Redrawn RedrawJpeg(std::span<const std::uint8_t> file) {
+Reencoded ReencodeJpeg(std::span<const std::uint8_t> file) {
     const Jpeg decoder = Own(tjInitDecompress());
     Pixels pixels;
     int colours = 0;
@@ -150,7 +150,7 @@ AvPtr<AVFrame> Decode(AVCodecID id, std::span<const std::uint8_t> file) {
     }
     const AvPtr<AVCodecContext> decoder = OwnAv(avcodec_alloc_context3(codec));
     decoder->thread_count = 1;
-    decoder->max_pixels = kMaxRedrawnPixels;
+    decoder->max_pixels = kMaxReencodedPixels;
     CheckAv(avcodec_open2(decoder.get(), codec, nullptr), "cannot open the decoder");
     const AvPtr<AVPacket> packet = OwnAv(av_packet_alloc());
     CheckAv(av_new_packet(packet.get(), static_cast<int>(file.size())), "cannot hold the picture");
@@ -212,7 +212,7 @@ Pixels PixelsOf(const AVFrame& frame) {
     return pixels;
 }
 
-Redrawn RedrawByLibav(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) {
+Reencoded ReencodeByLibav(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) {
     if (HasTooManyPixels(SizeInHead(type, file))) {
         return {Outcome::kTooManyPixels, {}};
     }
@@ -237,10 +237,10 @@ Redrawn RedrawByLibav(std::string_view type, std::span<const std::uint8_t> file,
 
 }  // namespace
 
-Redrawn Redraw(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) {
+Reencoded Reencode(std::string_view type, std::span<const std::uint8_t> file, std::size_t max_bytes) {
     try {
-        Redrawn redrawn = type == "jpg" ? RedrawJpeg(file) : RedrawByLibav(type, file, max_bytes);
-        return redrawn.file.size() <= max_bytes ? redrawn : Redrawn{Outcome::kTooLarge, {}};
+        Reencoded reencoded = type == "jpg" ? ReencodeJpeg(file) : ReencodeByLibav(type, file, max_bytes);
+        return reencoded.file.size() <= max_bytes ? reencoded : Reencoded{Outcome::kTooLarge, {}};
     } catch (const SourceError&) {
         return {};
     }
