@@ -113,7 +113,7 @@ class MonitoringTest(unittest.TestCase):
         self.assertEqual((done.returncode, done.stdout + done.stderr), (0, ""))
         subprocess.run(["promtool", "check", "rules", ROOT / "packaging/monitoring/alerts.yml"], check=True, capture_output=True)
 
-    def test_tells_strangers_nothing(self):
+    def test_tells_others_nothing(self):
         token = self.server.cli("setting", "set", "monitor-token", "new").strip()
         bearer = {"Authorization": f"Bearer {token}"}
         proxied = {"X-Forwarded-For": "192.0.2.9"}

@@ -70,9 +70,9 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
 
 LOOKHAVEN_ON_BOTH_ENGINES(CopyTest);
 
-class StrangersRecords : public EmptyStore {};
+class UntrustedRecords : public EmptyStore {};
 
-TEST_P(StrangersRecords, HoldNoStatementsOfTheirOwn) {
+TEST_P(UntrustedRecords, HoldNoStatementsOfTheirOwn) {
     constexpr const char* kHidden =
         "update sqlite_master set sql = replace(sql, 'CREATE VIRTUAL', 'CREATE/**/VIRTUAL') where name = 'f'";
     const struct {
@@ -102,7 +102,7 @@ TEST_P(StrangersRecords, HoldNoStatementsOfTheirOwn) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(, StrangersRecords, testing::Values(Engine::kSqlite), EngineName);
+INSTANTIATE_TEST_SUITE_P(, UntrustedRecords, testing::Values(Engine::kSqlite), EngineName);
 
 }  // namespace
 }  // namespace lookhaven::store

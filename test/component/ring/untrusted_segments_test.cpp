@@ -12,11 +12,11 @@
 namespace lookhaven::ring {
 namespace {
 
-constexpr uid_t kStranger = 65534;
+constexpr uid_t kOtherUser = 65534;
 constexpr int kTaken = 20;
 const StreamId kId{3, 0, Medium::kVideo};
 
-using StrangersTest = RingTest;
+using UntrustedSegmentsTest = RingTest;
 
 // The segments that the process made and that nobody but it has attached.
 std::vector<int> UntouchedSegmentsOf(pid_t creator) {
@@ -33,7 +33,7 @@ std::vector<int> UntouchedSegmentsOf(pid_t creator) {
     return segments;
 }
 
-TEST_F(StrangersTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
+TEST_F(UntrustedSegmentsTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
     struct Row {
         const char* name;
         uid_t creator;
@@ -42,16 +42,16 @@ TEST_F(StrangersTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
     };
     const uid_t us = ::geteuid();
     for (const Row& row : {
-             Row{"another user's", kStranger, kStranger, 0666},
-             Row{"given to us by another user", kStranger, us, 0600},
-             Row{"ours, given to another user", us, kStranger, 0600},
+             Row{"another user's", kOtherUser, kOtherUser, 0666},
+             Row{"given to us by another user", kOtherUser, us, 0600},
+             Row{"ours, given to another user", us, kOtherUser, 0600},
              Row{"open to other users", us, us, 0660},
          }) {
         SCOPED_TRACE(row.name);
         if (us != 0 && (row.creator != us || row.owner != us)) {
             continue;  // takes another user's account
         }
-        KilledChild stranger([&] {
+        KilledChild attacker([&] {
             ::close(STDERR_FILENO);  // it says of each key that it is taken
             if (row.creator != us && ::setuid(row.creator) != 0) {
                 throw std::runtime_error("not another user");
@@ -66,7 +66,7 @@ TEST_F(StrangersTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
                 ring.Release();
             }
         });
-        const std::vector<int> taken = UntouchedSegmentsOf(stranger.Pid());
+        const std::vector<int> taken = UntouchedSegmentsOf(attacker.Pid());
         ASSERT_EQ(taken.size(), std::size_t{kTaken});
         EXPECT_EQ(Attach(installation_, kId), nullptr);
         EXPECT_TRUE(ListSegments(installation_).empty());
@@ -75,12 +75,12 @@ TEST_F(StrangersTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
         EXPECT_THAT(testing::internal::GetCapturedStderr(), testing::HasSubstr("another user"));
         writer.Write({.data = MakeData(4'000, 7)});
         EXPECT_EQ(RemoveOrphans(installation_), 0U);
-        EXPECT_EQ(UntouchedSegmentsOf(stranger.Pid()), taken);
+        EXPECT_EQ(UntouchedSegmentsOf(attacker.Pid()), taken);
 
         for (const int shm_id : taken) {
             ::shmctl(shm_id, IPC_RMID, nullptr);
         }
-        stranger.Kill();
+        attacker.Kill();
         void* ring = Attach(installation_, kId);
         ASSERT_NE(ring, nullptr) << "the keys in front of the ring's became free";
         const Entry* entry = ReadLatest(ring);
@@ -91,7 +91,7 @@ TEST_F(StrangersTest, NeitherShowPicturesNorKeepTheStreamFromStarting) {
     }
 }
 
-TEST_F(StrangersTest, GeometryThatChangesUnderAReaderIsNotBelieved) {
+TEST_F(UntrustedSegmentsTest, GeometryThatChangesUnderAReaderIsNotBelieved) {
     Writer writer(installation_, kId, kH264, kSmall);
     void* ring = Attach(installation_, kId);
     SegmentConstants& shared = View(ring).Head().constants;
