@@ -18,7 +18,7 @@ constexpr std::int64_t kMaxPictureAgeUs = 10'000'000;
 constexpr std::int64_t kMaxWrittenAgeUs = 5'000'000;
 
 struct Problem {
-    std::string part;  // "recorder", "camera", "mount" or "store"
+    std::string subject;  // "recorder", "camera", "mount" or "store"
     int id = 0;        // of the camera or mount
     std::string message;
 };

@@ -92,7 +92,7 @@ std::string Health(const Call& call) {
     Json::Value& list = answer["data"]["problem"] = Json::arrayValue;
     for (const Problem& problem : problems) {
         Json::Value& json = list.append(Json::objectValue);
-        json["part"] = problem.part;
+        json["subject"] = problem.subject;
         if (problem.id != 0) {
             json["id"] = problem.id;
         }

@@ -31,7 +31,7 @@ const char* NameOf(control::RecorderState state) {
                                                      : "stopped";
 }
 
-Json::Value PartRecord(const char* name, const char* state, const std::optional<base::ProcessIdentity>& process) {
+Json::Value ProcessRecord(const char* name, const char* state, const std::optional<base::ProcessIdentity>& process) {
     const std::int64_t since_s = process ? base::StartedAt(*process) : 0;
     Json::Value json;
     json["name"] = name;
@@ -41,12 +41,12 @@ Json::Value PartRecord(const char* name, const char* state, const std::optional<
     return json;
 }
 
-Json::Value Parts(const base::Installation& installation) {
+Json::Value Processes(const base::Installation& installation) {
     const pid_t host = ::getppid();
     Json::Value list = Json::arrayValue;
     list.append(
-        PartRecord("recorder", NameOf(control::FindRecorder(installation)), control::RecorderProcess(installation)));
-    list.append(PartRecord("webapi", "running", base::ProcessIdentity{host, base::ProcessStartTicks(host)}));
+        ProcessRecord("recorder", NameOf(control::FindRecorder(installation)), control::RecorderProcess(installation)));
+    list.append(ProcessRecord("webapi", "running", base::ProcessIdentity{host, base::ProcessStartTicks(host)}));
     return list;
 }
 
@@ -84,7 +84,7 @@ Json::Value SystemStatus(const Call& call) {
     data["version"] = base::kVersion;
     data["store"]["engine"] = installation.StoreUrl().starts_with("sqlite:") ? "sqlite" : "postgresql";
     data["store"]["schema"] = store::Store::SchemaVersion();
-    data["part"] = Parts(installation);
+    data["process"] = Processes(installation);
     std::vector<doctor::Job> jobs;
     for (const doctor::Check& check : doctor::Checks()) {
         jobs.emplace_back([&] { return ReportOf(check, installation); });

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is looked at to see whether an installation is well: a function for each part of it, in the file of its kind.
+// The checks of an installation: a function for each, in the file of its kind.
 //
 // Invariants    (1) A check judges as the user who runs it, who must be the one that runs the server.
 //               (2) It changes nothing. Where another check tells the cause, it finds nothing. What it throws, a
-//               std::exception, is reported as a fault: that part cannot be checked.
+//               std::exception, is reported as a fault: that it cannot be checked.
 //               (3) A remedy that begins with a command's name is that command line, ready to be run; "as root: " may
 //               stand before it, and words in capitals are for the owner to fill in. Any other describes what a person
 //               must do.

@@ -44,7 +44,7 @@ class MonitoringTest(unittest.TestCase):
         status, body = self.get("/healthz")
         answer = json.loads(body)["data"]
         self.assertEqual((status, answer["healthy"]), (503, False) if answer["problem"] else (200, True))
-        return {(each["part"], each["message"]) for each in answer["problem"]}
+        return {(each["subject"], each["message"]) for each in answer["problem"]}
 
     def samples(self):
         status, text = self.get("/metrics")

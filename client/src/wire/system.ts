@@ -22,7 +22,7 @@ export interface Check {
   unchecked: string | null;
 }
 
-export interface Part {
+export interface SystemProcess {
   name: string;
   state: "running" | "hanging" | "stopped";
   /** Unix seconds. */
@@ -43,7 +43,7 @@ export interface Certificate {
 }
 
 export interface OfferedCertificate extends Certificate {
-  /** Names of hosts that would take this one for a stranger's. */
+  /** Names of hosts that do not trust this one. */
   pairedHosts: string[];
 }
 
@@ -65,7 +65,7 @@ export interface LogLevels {
 export interface SystemStatus {
   version: string;
   store: { engine: string; schema: number };
-  part: Part[];
+  process: SystemProcess[];
   certificate: Certificate | null;
   check: Check[];
 }

@@ -68,9 +68,9 @@ TEST_F(SystemApi, ManagersAreToldOfEachPartAndWhatToDo) {
     }
     EXPECT_EQ(before["store"]["engine"], "sqlite");
     EXPECT_TRUE(before["certificate"].isNull());
-    EXPECT_EQ(before["part"][0]["state"], "stopped");
-    EXPECT_EQ(before["part"][1]["name"], "webapi");
-    EXPECT_NEAR(static_cast<double>(before["part"][1]["since"].asInt64()), static_cast<double>(base::WallSeconds()),
+    EXPECT_EQ(before["process"][0]["state"], "stopped");
+    EXPECT_EQ(before["process"][1]["name"], "webapi");
+    EXPECT_NEAR(static_cast<double>(before["process"][1]["since"].asInt64()), static_cast<double>(base::WallSeconds()),
                 120);
 
     const std::string tls = host_.Home().TlsFolder().string();
@@ -83,8 +83,8 @@ TEST_F(SystemApi, ManagersAreToldOfEachPartAndWhatToDo) {
     store::RecordingServers(store).Add(annex, secret_);
     control::CommonConfigKeeper(host_.Home()).Refresh(false);
     const Json::Value after = Status();
-    EXPECT_EQ(after["part"][0]["state"], "running");
-    EXPECT_NEAR(static_cast<double>(after["part"][0]["since"].asInt64()), static_cast<double>(base::WallSeconds()), 120)
+    EXPECT_EQ(after["process"][0]["state"], "running");
+    EXPECT_NEAR(static_cast<double>(after["process"][0]["since"].asInt64()), static_cast<double>(base::WallSeconds()), 120)
         << "this process stands for the recorder";
     const Json::Value certificate = after["certificate"];
     EXPECT_EQ(certificate["subject"], "CN=nvr,O=Ünder Test");

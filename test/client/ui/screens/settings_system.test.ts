@@ -68,7 +68,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     const mounts = { name: "mounts", ok: false, finding: [{ problem: "there is no mount", remedy: "lookhaven init", severity }], unchecked: null };
     const certificate = { subject: "CN=nvr", name: ["nvr"], fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
     const recorder = { name: "recorder", state: "running" as const, since: 1_790_000_000, replaced: false };
-    setup.status = { version: "1.2.3", store: { engine: "sqlite", schema: 7 }, part: [recorder], certificate, check: [folder, mounts] };
+    setup.status = { version: "1.2.3", store: { engine: "sqlite", schema: 7 }, process: [recorder], certificate, check: [folder, mounts] };
     const page = await open("system");
     await page.getByText("1 problem", { exact: true }).waitFor();
     await page.getByRole("button", { name: "Copy lookhaven init" }).click();
@@ -105,7 +105,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
   test("a certificate is replaced once its files are checked and its price is told; log levels are set, nobody's lost", async () => {
     const certificate = { subject: "CN=nvr", name: ["nvr"], fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
     const store = { engine: "sqlite", schema: 7 };
-    setup.status = { version: "1.2.3", store, part: [], certificate, check: [] };
+    setup.status = { version: "1.2.3", store, process: [], certificate, check: [] };
     setup.log.category = [{ name: "liveview", level: "error" }, { name: "100", level: "off" }];
     setup.offered = null;
     const page = await open("system");

@@ -11,7 +11,7 @@ import { formPart } from "../../widgets/fields";
 import { calendarDate } from "../../widgets/text";
 import { askForCertificate } from "./certificate_dialog";
 import { copyable } from "./copyable";
-import { commandOf, kKindNames, linesOf, partName, partText, storeText, summaryText, type Line } from "./system_text";
+import { commandOf, kKindNames, linesOf, processName, processText, storeText, summaryText, type Line } from "./system_text";
 
 export class HealthPanel {
   readonly root = element("div", { class: "form-group" });
@@ -43,15 +43,15 @@ export class HealthPanel {
 }
 
 function content(status: SystemStatus, replaceCertificate: () => void): HTMLElement[] {
-  const { version, store, part, certificate, check } = status;
+  const { version, store, process, certificate, check } = status;
   const lines = linesOf(check);
   const summary = element("p", { class: "health-summary", role: "status" }, summaryText(lines));
   const list = lines.length > 0 ? [element("ul", { class: "settings-list health-list" }, ...lines.map(lineRow))] : [];
-  const well = check.filter(({ ok, finding }) => ok && finding.length === 0).map(({ name }) => name);
-  const rest = well.length > 0 ? [element("p", { class: "quiet" }, `OK: ${well.join(", ")}.`)] : [];
+  const passed = check.filter(({ ok, finding }) => ok && finding.length === 0).map(({ name }) => name);
+  const rest = passed.length > 0 ? [element("p", { class: "quiet" }, `OK: ${passed.join(", ")}.`)] : [];
   const facts = factList([
     ["Version", version],
-    ...part.map((one): [string, string] => [partName(one), partText(one)]),
+    ...process.map((one): [string, string] => [processName(one), processText(one)]),
     ["Store", storeText(store)],
   ]);
   return [

@@ -2,7 +2,7 @@
 //
 // The state of the installation in words, the worst first.
 
-import type { Check, Finding, Part, SystemStatus } from "../../../wire/system";
+import type { Check, Finding, SystemProcess, SystemStatus } from "../../../wire/system";
 import { counted } from "../../widgets/amounts";
 import { minuteText } from "../../widgets/text";
 
@@ -49,17 +49,17 @@ export function commandOf(remedy: Finding["remedy"]): string | null {
   return found?.[1] ?? null;
 }
 
-const kPartNames: Record<string, string> = { recorder: "Recorder", webapi: "Web API" };
-const kPartStates: Record<Part["state"], string> = { running: "running", hanging: "hangs", stopped: "not running" };
+const kProcessNames: Record<string, string> = { recorder: "Recorder", webapi: "Web API" };
+const kProcessStates: Record<SystemProcess["state"], string> = { running: "running", hanging: "hangs", stopped: "not running" };
 
-export function partName({ name }: Part): string {
-  return kPartNames[name] ?? name;
+export function processName({ name }: SystemProcess): string {
+  return kProcessNames[name] ?? name;
 }
 
 /** "running since 24 Nov 01:45" */
-export function partText({ state, since, replaced }: Part): string {
+export function processText({ state, since, replaced }: SystemProcess): string {
   const begin = since === null ? "" : ` since ${minuteText(since * 1000)}`;
-  return `${kPartStates[state]}${begin}${replaced ? "; restart it to run the updated program" : ""}`;
+  return `${kProcessStates[state]}${begin}${replaced ? "; restart it to run the updated program" : ""}`;
 }
 
 export function storeText({ engine, schema }: SystemStatus["store"]): string {
