@@ -4,7 +4,7 @@
 //
 // Why so        Who has an account need not be able to write anything on this machine, and an account can be stolen.
 //               What it can have written is therefore bounded: folders below those that the machine's owner allows by
-//               lookhaven setting set mount-folders, empty ones, and none to which somebody else can write, or which
+//               lookhaven setting set mount_folders, empty ones, and none to which somebody else can write, or which
 //               could be replaced by a link later. The command line does not ask: its user can write wherever the
 //               server can.
 #pragma once

@@ -110,7 +110,7 @@ std::string StoredText(const Setting& setting, const Json::Value& value) {
     case Kind::kToken:
         break;
     }
-    Refuse(setting, "can only be replaced: lookhaven setting set monitor-token new");
+    Refuse(setting, "can only be replaced: lookhaven setting set monitor_token new");
 }
 
 const Setting& RequireSetting(const std::string& name) {

@@ -35,7 +35,7 @@ constexpr std::int64_t kMaxAuditEntries = 200;
 constexpr int kMonitorUserId = -1;  // all monitors together
 constexpr int kStatusUserId = -2;   // all who look at the state
 constexpr const char* kNoMonitor =
-    "monitors must run on this machine or send the token of lookhaven setting set monitor-token";
+    "monitors must run on this machine or send the token of lookhaven setting set monitor_token";
 
 // Null when it cannot be opened, which is what a monitor wants to be told.
 store::Store* TryToOpen(const Call& call) {

@@ -94,10 +94,11 @@ void AddSetting(CLI::App& program, const Console& console) {
     }
     set.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
         .Option("value", set.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
-    set.Add("mount-folders", "Folders below which managers may add mounts in the browser, such as /mnt:/media",
-            SetMountFolders)
+    set.Add(store::kMountFoldersSetting,
+            "Folders below which managers may add mounts in the browser, such as /mnt:/media", SetMountFolders)
         .Option("value", set.request().word, "The folders, with : between them", Required);
-    set.Add("monitor-token", "Token that lets a monitor on another machine read /healthz and /metrics", SetMonitorToken)
+    set.Add(store::kMonitorTokenSetting, "Token that lets a monitor on another machine read /healthz and /metrics",
+            SetMonitorToken)
         .Option("value", set.request().word, "new: replaces it and prints it, once; off: removes it", Required,
                 Satisfies(CLI::IsMember({"new", "off"})));
 }

@@ -114,7 +114,7 @@ class MonitoringTest(unittest.TestCase):
         subprocess.run(["promtool", "check", "rules", ROOT / "packaging/monitoring/alerts.yml"], check=True, capture_output=True)
 
     def test_tells_others_nothing(self):
-        token = self.server.cli("setting", "set", "monitor-token", "new").strip()
+        token = self.server.cli("setting", "set", "monitor_token", "new").strip()
         bearer = {"Authorization": f"Bearer {token}"}
         proxied = {"X-Forwarded-For": "192.0.2.9"}
         for path in ("/healthz", "/metrics"):
@@ -127,7 +127,7 @@ class MonitoringTest(unittest.TestCase):
             for word, status in ([], "401"), (["-H", f"Authorization: Bearer {token}"], "200"):
                 shown = subprocess.run(["curl", "-ksS", "-o", os.devnull, "-w", "%{http_code}", *word, url], capture_output=True, text=True)
                 self.assertEqual(shown.stdout, status)
-        self.server.cli("setting", "set", "monitor-token", "off")
+        self.server.cli("setting", "set", "monitor_token", "off")
         self.assertEqual(self.get("/healthz", {**proxied, **bearer})[0], 401)
 
 

@@ -53,9 +53,9 @@ TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
           {"camera set 1 --mount 1 --json", 0, "\"mount_id\" : 1"},
           {"mount remove 1", 65, "cameras record"},
           {"camera set 1 --mount 0", 0, "Changed"}});
-    Play({{"setting set mount-folders srv", 65, "begins with /"},
-          {"setting set mount-folders /srv:", 65, "begins with /"},
-          {"setting set mount-folders /srv:/mnt", 0, "/srv:/mnt"}});
+    Play({{"setting set mount_folders srv", 65, "begins with /"},
+          {"setting set mount_folders /srv:", 65, "begins with /"},
+          {"setting set mount_folders /srv:/mnt", 0, "/srv:/mnt"}});
     store::Events events(store);
     AddRow(events, 1, kStart, base::kReasonContinuous, false);
     Play({{"mount set 1 --limit 500", 64, "a size looks like"},

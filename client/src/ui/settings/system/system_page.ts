@@ -116,8 +116,8 @@ function descriptions({ settings }: Stored): Descriptions<Values> {
 
 const kCommands: Record<string, string> = {
   login_port: "lookhaven setting set login_port 8080",
-  mount_folders: "lookhaven setting set mount-folders /mnt:/media:/srv",
-  monitor_token: "lookhaven setting set monitor-token new",
+  mount_folders: "lookhaven setting set mount_folders /mnt:/media:/srv",
+  monitor_token: "lookhaven setting set monitor_token new",
 };
 
 function operatorsSetting({ name, value, meaning }: SettingRecord): HTMLElement {
