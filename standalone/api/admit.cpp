@@ -37,12 +37,12 @@ constexpr std::chrono::milliseconds kSearchPoll{10};
 constexpr std::chrono::seconds kSearchWait{10};
 
 void Occupy(control::SlotTable& slots, control::Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
-    switch (slots.Admit(slot, user, max_of_user, max_in_all)) {
-    case control::Admission::kGranted:
+    switch (slots.BeginRequest(slot, user, max_of_user, max_in_all)) {
+    case control::QuotaResult::kGranted:
         return;
-    case control::Admission::kTooManyOfUser:
+    case control::QuotaResult::kTooManyOfUser:
         throw Failure(503, "too many requests of this account are running", http::kRetrySoonSeconds);
-    case control::Admission::kTooMany:
+    case control::QuotaResult::kTooMany:
         throw Failure(503, "too many requests are running", http::kRetrySoonSeconds);
     }
 }

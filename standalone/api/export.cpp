@@ -110,14 +110,14 @@ evidence::Request RequestOf(const Call& call) {
 
 void OccupyExport(const Call& call) {
     switch (call.slots.BeginExport(call.slot, kMaxExportsOfUser, kMaxExports)) {
-    case control::Admission::kGranted:
+    case control::QuotaResult::kGranted:
         return;
-    case control::Admission::kTooManyOfUser:
+    case control::QuotaResult::kTooManyOfUser:
         throw Failure(429,
                       "this account is exporting " + std::to_string(kMaxExportsOfUser) +
                           " files already: wait until one is complete",
                       http::kRetrySoonSeconds);
-    case control::Admission::kTooMany:
+    case control::QuotaResult::kTooMany:
         throw Failure(503, "too many exports are running; try again in a moment", http::kRetrySoonSeconds);
     }
 }

@@ -73,8 +73,8 @@ store::Store* AdmitMonitor(const Call& call) {
     if (!is_from_here && !base::IsHex(token, store::kMonitorTokenDigits)) {
         throw Failure(401, kNoMonitor);
     }
-    if (call.slots.Admit(call.slot, kMonitorUserId, kMaxMonitors, std::numeric_limits<std::size_t>::max()) !=
-        control::Admission::kGranted) {
+    if (call.slots.BeginRequest(call.slot, kMonitorUserId, kMaxMonitors, std::numeric_limits<std::size_t>::max()) !=
+        control::QuotaResult::kGranted) {
         throw Failure(503, "too many monitors are asking", http::kRetrySoonSeconds);
     }
     store::Store* const records = TryToOpen(call);
@@ -138,8 +138,8 @@ std::string Audit(const Call& call) {
 std::string Status(const Call& call) {
     constexpr std::size_t kMaxAtOnce = 2;  // each has a process for each check
     admin::RequireManager(call.Records(), call.Actor());
-    if (call.slots.Admit(call.slot, kStatusUserId, kMaxAtOnce, std::numeric_limits<std::size_t>::max()) !=
-        control::Admission::kGranted) {
+    if (call.slots.BeginRequest(call.slot, kStatusUserId, kMaxAtOnce, std::numeric_limits<std::size_t>::max()) !=
+        control::QuotaResult::kGranted) {
         throw Failure(503, "others are looking at the state just now", http::kRetrySoonSeconds);
     }
     return SuccessAnswer(SystemStatus(call));

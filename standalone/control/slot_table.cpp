@@ -119,16 +119,16 @@ std::size_t SlotTable::CountOthers(const Slot& slot, const std::function<bool(co
         Used(), [&](const Slot& each) { return &each != &slot && each.serial != 0 && counts(each); }));
 }
 
-Admission SlotTable::Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
+QuotaResult SlotTable::BeginRequest(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
     const SharedLock lock = TryLock(guard_->mutex);
     if (!lock || CountOthers(slot, [](const Slot& each) { return each.user != 0; }) >= max_in_all) {
-        return Admission::kTooMany;
+        return QuotaResult::kTooMany;
     }
     if (CountOthers(slot, [user](const Slot& each) { return each.user == user; }) >= max_of_user) {
-        return Admission::kTooManyOfUser;
+        return QuotaResult::kTooManyOfUser;
     }
     slot.user = user;
-    return Admission::kGranted;
+    return QuotaResult::kGranted;
 }
 
 bool SlotTable::BeginSearch(Slot& slot, std::size_t max_of_user) {
@@ -169,18 +169,18 @@ bool SlotTable::BeginProbing(Slot& slot, std::size_t max_in_all) {
     return true;
 }
 
-Admission SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all) {
+QuotaResult SlotTable::BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all) {
     const SharedLock lock = TryLock(guard_->mutex);
     const auto exports = [](const Slot& each) { return each.work == Work::kExport; };
     const auto of_user = [&](const Slot& each) { return exports(each) && each.user == slot.user; };
     if (lock && CountOthers(slot, of_user) >= max_of_user) {
-        return Admission::kTooManyOfUser;
+        return QuotaResult::kTooManyOfUser;
     }
     if (!lock || CountOthers(slot, exports) >= max_in_all) {
-        return Admission::kTooMany;
+        return QuotaResult::kTooMany;
     }
     slot.work = Work::kExport;
-    return Admission::kGranted;
+    return QuotaResult::kGranted;
 }
 
 bool SlotTable::BeginWatch(Slot& slot, std::size_t max_of_user) {

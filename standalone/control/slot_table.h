@@ -71,7 +71,7 @@ struct HashingLimits {
     std::size_t of_user;
 };
 
-enum class Admission { kGranted, kTooManyOfUser, kTooMany };
+enum class QuotaResult { kGranted, kTooManyOfUser, kTooMany };
 
 constexpr std::size_t kSlotBytes = 4096;  // where pages are larger, a few slots share one
 
@@ -130,7 +130,7 @@ class SlotTable {
     // once, no more than the limit succeed.
     //
     // The request is the user's from here on. Counted are admitted requests.
-    Admission Admit(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all);
+    QuotaResult BeginRequest(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all);
     // One of its user's searches, until the process ends or its answer turns out to be a stream. False: no room.
     bool BeginSearch(Slot& slot, std::size_t max_of_user);
     // Until EndHashing. False: no room.
@@ -139,7 +139,7 @@ class SlotTable {
     // Until the process ends. False: no room.
     bool BeginProbing(Slot& slot, std::size_t max_in_all);
     // Of its user's exports, until the process ends. kGranted, or for lack of room nothing is changed.
-    Admission BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
+    QuotaResult BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
     // One of its user's watches, and no search any more, until the process ends. False: no room.
     bool BeginWatch(Slot& slot, std::size_t max_of_user);
 

@@ -8,7 +8,7 @@
 /** What a network delivers at once after a stall; decoders are far faster than cameras. */
 export const kMaxQueuedFrames = 20;
 
-export type Admission =
+export type FrameDecision =
   | "decode"
   /** Leave the frame out. */
   | "drop"
@@ -20,7 +20,7 @@ export class FrameGate {
   #behind = false;
 
   /** `queued` frames wait to be decoded. */
-  admit(isKey: boolean, queued: number): Admission {
+  admit(isKey: boolean, queued: number): FrameDecision {
     if (queued > kMaxQueuedFrames) this.#behind = this.#waitsForKey = true;
     if (!isKey) return this.#waitsForKey ? "drop" : "decode";
     // The decoder may have caught up since: then nothing has to be discarded.

@@ -45,11 +45,12 @@ TEST(SlotTable, IsNotOvershotByABurst) {
         slots.push_back(table.Take());
     }
     ASSERT_EQ(table.Take(), nullptr);
-    const auto admit = [&table](Slot& slot) { return table.Admit(slot, 7, 5, 100) == Admission::kGranted; };
+    const auto admit = [&table](Slot& slot) { return table.BeginRequest(slot, 7, 5, 100) == QuotaResult::kGranted; };
     const auto hash = [&table](Slot& slot) { return table.BeginHashing(slot, {4, 4, 4}); };
     EXPECT_EQ(SucceedAtOnce(slots, admit), 5);
     EXPECT_EQ(SucceedAtOnce(slots, hash), 4);
-    EXPECT_EQ(table.Admit(*slots[0], 8, 5, 5), slots[0]->user == 7 ? Admission::kGranted : Admission::kTooMany);
+    EXPECT_EQ(table.BeginRequest(*slots[0], 8, 5, 5),
+              slots[0]->user == 7 ? QuotaResult::kGranted : QuotaResult::kTooMany);
     const auto other = std::ranges::find(slots, false, [](const Slot* slot) { return slot->is_hashing.load(); });
     EXPECT_FALSE(hash(**other)) << "the host has not reaped those that ended";
     for (Slot* slot : slots) {
@@ -66,17 +67,17 @@ TEST(SlotTable, ExportsAreFewAndSearchesUntilTheyAreSent) {
         slots.push_back(table.Take());
         slots.back()->user = user;
     }
-    const Admission expected[] = {Admission::kGranted, Admission::kGranted, Admission::kTooManyOfUser,
-                                  Admission::kGranted, Admission::kTooMany};
+    const QuotaResult expected[] = {QuotaResult::kGranted, QuotaResult::kGranted, QuotaResult::kTooManyOfUser,
+                                    QuotaResult::kGranted, QuotaResult::kTooMany};
     for (std::size_t i = 0; i < slots.size(); ++i) {
         EXPECT_EQ(table.BeginExport(*slots[i], 2, 3), expected[i]) << i;
     }
     EXPECT_FALSE(table.BeginSearch(*slots[2], 2));
     slots[0]->is_stream = true;
     EXPECT_TRUE(table.BeginSearch(*slots[2], 2));
-    EXPECT_EQ(table.BeginExport(*slots[2], 2, 9), Admission::kTooManyOfUser);
+    EXPECT_EQ(table.BeginExport(*slots[2], 2, 9), QuotaResult::kTooManyOfUser);
     table.Free(*slots[1]);
-    EXPECT_EQ(table.BeginExport(*slots[2], 2, 3), Admission::kGranted);
+    EXPECT_EQ(table.BeginExport(*slots[2], 2, 3), QuotaResult::kGranted);
 }
 
 TEST(SlotTable, LeavesLogInsRoomToHashAndSearchesTheirMark) {
