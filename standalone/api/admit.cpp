@@ -72,7 +72,7 @@ CostClass CostClassOf(const Call& call) {
     const bool counts_footage =
         call.api == kCameraApi.name && call.method == "List" && call.Parameter("footage") != Json::Value(false);
     const bool reads_all = call.api == kSystemApi.name && call.method == "Status";
-    const bool waits_for_host = call.api == kServerApi.name && call.method == "Pair";
+    const bool waits_for_host = call.api == kServerApi.name && call.method == "Add";
     if (counts_footage || reads_all || waits_for_host) {
         return CostClass::kSearch;
     }

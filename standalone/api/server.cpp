@@ -133,7 +133,7 @@ const char* NameOf(admin::CannotPair::Reason reason) {
     return "null";
 }
 
-std::string Pair(const Call& call) {
+std::string Add(const Call& call) {
     RequireNoPasswordInQuery(call);
     RequireNotInQuery(call, {"code"});
     std::string name;
@@ -188,7 +188,7 @@ using enum Method::Audience;
 constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},
                                {"Check", Check, kChanges, kManagers},
                                {"Invite", Invite, kChanges, kManagers},
-                               {"Pair", Pair, kChanges, kManagers},
+                               {"Add", Add, kChanges, kManagers},
                                {"Remove", Remove, kChanges, kManagers}};
 
 }  // namespace

@@ -194,7 +194,7 @@ class PairingTest(unittest.TestCase):
             return answer.json["data"]["code"]
 
         def pair(code, port=self.owner.tls_port, address="localhost"):
-            answer = ask(self.watcher, "Pair", name="By code", address=address, port=port, code=code, reauth=PASSWORDS["admin"])
+            answer = ask(self.watcher, "Add", name="By code", address=address, port=port, code=code, reauth=PASSWORDS["admin"])
             return answer.json["data"]["server"] if answer.status == 200 else (answer.json["error"]["data"] or {"reason": answer.status})["reason"]
 
         replaced, code = invite(), invite()

@@ -81,7 +81,7 @@ Relay.Play server=2 camera={camera}                                   E      E  
 POST Server.List                                                      E      E     F       F     F    F       F        F      D       E
 POST Server.Check id={server}                                         E      E     F       F     F    F       F        F      D/N     E
 POST Server.Invite name=x reauth=own                                  E      E     F       F     F    F       F        F      D       E
-POST Server.Pair name=x address=127.0.0.1 code=x                      E      E     F       F     F    F       F        F      B       E
+POST Server.Add  name=x address=127.0.0.1 code=x                      E      E     F       F     F    F       F        F      B       E
 POST Server.Remove id={server} revision=1                             E      E     F       F     F    F       F        F      C/N     E
 System.Health                                                         D      D     D       D     D    D       D        D      D       D
 System.Metrics                                                        D      D     D       D     D    D       D        D      D       D

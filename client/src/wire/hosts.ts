@@ -82,7 +82,7 @@ export class Hosts {
     host: { name: string; address: string; port: number; code: string; reauth: string; confirm: boolean },
   ): Promise<{ server: HostRecord } | { confirm: HostLoss }> {
     try {
-      return await this.#server.call(kApi, "Pair", {}, { json: host, timeoutMs: kPairTimeoutMs });
+      return await this.#server.call(kApi, "Add", {}, { json: host, timeoutMs: kPairTimeoutMs });
     } catch (error) {
       const { status, code, message, data } = asServerError(error);
       const reason = kWhyNot[(data as { reason?: string } | null)?.reason ?? ""];

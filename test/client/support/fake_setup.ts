@@ -71,7 +71,7 @@ export class FakeSetup {
     "VEXO.Server.List": () => ok({ server: this.host, centralManagement: false }),
     "VEXO.Server.Check": () => ok({ answers: !this.whyNoHost, reason: this.whyNoHost }),
     "VEXO.Server.Invite": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : ok({ code: kCode, seconds: 600 })),
-    "VEXO.Server.Pair": (request) => (this.whyNoHost ? failed(502, "no", { reason: this.whyNoHost }) : this.#addHost(request)),
+    "VEXO.Server.Add": (request) => (this.whyNoHost ? failed(502, "no", { reason: this.whyNoHost }) : this.#addHost(request)),
     "VEXO.Server.Remove": (request) => this.#removeHost(request),
     "VEXO.System.Audit": () => ok({ entry: [], more: false }),
     "VEXO.System.Status": () => ok(this.status),
@@ -96,7 +96,7 @@ export class FakeSetup {
     if (this.hostReplaced && !confirm) return ok({ confirm: this.hostReplaced });
     const record = { id: 9, revision: 1, name, address, port, enabled: true, camera: [{ id: 7, idOnServer: 1, name: "Yard" }], denial: [] };
     this.host.push(record);
-    return this.#note("Server.Pair", request, ok({ server: record }));
+    return this.#note("Server.Add", request, ok({ server: record }));
   }
 
   #removeHost(request: Request): Answer {

@@ -107,12 +107,12 @@ TEST_F(ServerApi, SaysWhatIsWrongWithACodeOrAnAddressAndNoMoreThanThat) {
         {nowhere + code, 502, R"({"reason":"unreachable"})"},
     };
     for (const auto& row : rows) {
-        const Answer answer = Ask("Pair", row.body);
+        const Answer answer = Ask("Add", row.body);
         EXPECT_EQ(answer.status, row.status) << row.body;
         EXPECT_THAT(answer.body, HasSubstr(row.says)) << row.body;
     }
     EXPECT_EQ(Ask("Pair&code=" + code, "name=x&address=127.0.0.1&port=1").status, 400);
-    EXPECT_EQ(Ask("Pair", away + code).body, Ask("Pair", nowhere + code).body) << "whatever the address is";
+    EXPECT_EQ(Ask("Add", away + code).body, Ask("Add", nowhere + code).body) << "whatever the address is";
     EXPECT_TRUE(store::RecordingServers(store_).List().empty());
 }
 

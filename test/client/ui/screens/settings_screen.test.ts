@@ -176,7 +176,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.locator(".record-head", { hasText: "answers" }).waitFor();
     await page.getByText("central management is off").waitFor();
     const asked = { name: "Warehouse", address: "nvr2.example", port: 443, code: kCode, reauth: "right", confirm: true };
-    expect(setup.asked).toEqual([["Server.Pair", asked]]);
+    expect(setup.asked).toEqual([["Server.Add", asked]]);
     setup.hostReplaced = null;
     setup.whyNoHost = "its clock is 5 minutes behind";
     await page.evaluate(() => location.reload());
