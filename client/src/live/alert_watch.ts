@@ -34,7 +34,8 @@ export async function watchAlerts(
     let nowS = 0;
     const take = ({ name, id, data }: StreamEvent) => {
       if (name === "start") {
-        const start = JSON.parse(data) as { missed: number; time: number };
+        const start = JSON.parse(data) as { missed: number; resumed: boolean; time: number };
+        if (place && !start.resumed) server.alerts.noteGap();
         [missed, nowS] = [start.missed, start.time - performance.now() / 1000];
       } else if (name === "mark") {
         const mark = JSON.parse(data) as RawMark;

@@ -8,29 +8,43 @@ import type { Camera } from "./server";
 /** How long a camera's picture has its frame. */
 export const kFrameMs = 10_000;
 
+export interface News {
+  /** How many the user has not seen yet. */
+  count: number;
+  /** The connection was lost for so long that there may be others. */
+  mayBeMore: boolean;
+}
+
+const kNoNews: News = { count: 0, mayBeMore: false };
+
 export class Alerts {
   readonly #listeners = new Set<() => void>();
   readonly #latest = new Map<number, { kind: RawMark["kind"]; untilMs: number }>();
-  #count = 0;
+  #news = kNoNews;
 
-  /** How many the user has not seen yet. */
-  get count(): number {
-    return this.#count;
+  get news(): News {
+    return this.#news;
   }
 
   /** `isFresh`: it happens now, rather than having been missed. */
   note(mark: RawMark, isFresh: boolean): void {
-    this.#count += 1;
+    this.#news = { ...this.#news, count: this.#news.count + 1 };
     if (isFresh) this.#latest.set(mark.camera_id, { kind: mark.kind, untilMs: performance.now() + kFrameMs });
     this.#tell();
   }
 
-  /** The user looks at the events; returns how many are new. */
-  look(): number {
-    const count = this.#count;
-    this.#count = 0;
-    if (count > 0) this.#tell();
-    return count;
+  /** Nobody knows what was reported before now. */
+  noteGap(): void {
+    this.#news = { ...this.#news, mayBeMore: true };
+    this.#tell();
+  }
+
+  /** The user looks at the events; returns what is new. */
+  look(): News {
+    const news = this.#news;
+    this.#news = kNoNews;
+    if (news.count > 0 || news.mayBeMore) this.#tell();
+    return news;
   }
 
   /** What the camera's picture has a frame for; null for none, and for another server's camera. */
@@ -45,7 +59,7 @@ export class Alerts {
     this.look();
   }
 
-  /** Calls `changed` after each change of the count, until `signal` is aborted. */
+  /** Calls `changed` after each change of the news, until `signal` is aborted. */
   listen(changed: () => void, signal: AbortSignal): void {
     this.#listeners.add(changed);
     signal.addEventListener("abort", () => this.#listeners.delete(changed));

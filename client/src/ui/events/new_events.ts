@@ -4,13 +4,14 @@
 
 import type { Alerts } from "../../wire/alerts";
 import { notify } from "../widgets/notice";
+import { newsText } from "./news_text";
 
 /** Until `closed` is aborted. */
 export function tellNewEvents(alerts: Alerts, closed: AbortSignal): void {
-  const look = () => (document.hidden ? 0 : alerts.look());
+  const look = () => (document.hidden ? "" : newsText(alerts.look()));
   const tell = () => {
-    const count = look();
-    if (count > 0) notify(`${count} new since you looked.`);
+    const text = look();
+    if (text) notify(`${text}.`);
   };
   document.addEventListener("visibilitychange", tell, { signal: closed });
   tell();

@@ -3,6 +3,7 @@
 // The links from screen to screen, in the bar of each.
 
 import type { Alerts } from "../../wire/alerts";
+import { newsText } from "../events/news_text";
 import { element, setText } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 import type { ScreenName } from "./route";
@@ -18,9 +19,10 @@ const kLinks: [ScreenName, IconName, label: string, href: string][] = [
 function badge(alerts: Alerts, closed: AbortSignal): HTMLElement {
   const root = element("span", { class: "nav-badge" });
   const show = () => {
-    root.hidden = alerts.count === 0;
-    setText(root, alerts.count > 99 ? "99+" : String(alerts.count || ""));
-    root.title = `${alerts.count} new since you looked`;
+    const { count, mayBeMore } = alerts.news;
+    root.hidden = count === 0 && !mayBeMore;
+    setText(root, count > 99 ? "99+" : `${count || ""}${mayBeMore ? "+" : ""}`);
+    root.title = newsText(alerts.news);
   };
   alerts.listen(show, closed);
   show();
