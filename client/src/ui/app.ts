@@ -7,6 +7,7 @@ import { streamLimit } from "../live/stream_budget";
 import { protocol } from "../wire/protocol";
 import { Server, type Account } from "../wire/server";
 import { isKindChosen } from "./events/event_filter";
+import { AlertNotifications } from "./screens/alert_notifications";
 import { EventsScreen } from "./screens/events_screen";
 import { keepTrying } from "./screens/keep_trying";
 import { loginScreen } from "./screens/login_screen";
@@ -107,7 +108,10 @@ export class App {
     }
     this.#watching?.abort();
     this.#watching = new AbortController();
-    void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, isKindChosen, this.#watching.signal);
+    const { signal } = this.#watching;
+    void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, isKindChosen, signal);
+    const nameOf = async (id: number) => (await this.#server.cameras()).camera?.find((one) => one.id === id)?.name ?? "";
+    new AlertNotifications(account.user_id).follow(this.#server.alerts, nameOf, signal);
     this.#followRoute();
   }
 

@@ -19,6 +19,7 @@ const kNoNews: News = { count: 0, mayBeMore: false };
 
 export class Alerts {
   readonly #listeners = new Set<() => void>();
+  readonly #freshListeners = new Set<(mark: RawMark) => void>();
   readonly #latest = new Map<number, { kind: RawMark["kind"]; untilMs: number }>();
   #news = kNoNews;
 
@@ -29,7 +30,10 @@ export class Alerts {
   /** `isFresh`: it happens now, rather than having been missed. */
   note(mark: RawMark, isFresh: boolean): void {
     this.#news = { ...this.#news, count: this.#news.count + 1 };
-    if (isFresh) this.#latest.set(mark.camera_id, { kind: mark.kind, untilMs: performance.now() + kFrameMs });
+    if (isFresh) {
+      this.#latest.set(mark.camera_id, { kind: mark.kind, untilMs: performance.now() + kFrameMs });
+      for (const happened of this.#freshListeners) happened(mark);
+    }
     this.#tell();
   }
 
@@ -63,6 +67,12 @@ export class Alerts {
   listen(changed: () => void, signal: AbortSignal): void {
     this.#listeners.add(changed);
     signal.addEventListener("abort", () => this.#listeners.delete(changed));
+  }
+
+  /** Calls `happened` for each that happens now, until `signal` is aborted. */
+  listenFresh(happened: (mark: RawMark) => void, signal: AbortSignal): void {
+    this.#freshListeners.add(happened);
+    signal.addEventListener("abort", () => this.#freshListeners.delete(happened));
   }
 
   #tell(): void {

@@ -11,6 +11,7 @@ import { secretField } from "../widgets/fields";
 import { openDialog } from "../widgets/form_dialog";
 import { icon, type IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";
+import { AlertNotifications } from "./alert_notifications";
 import type { Session } from "./session";
 
 export class AccountMenu {
@@ -37,6 +38,7 @@ export class AccountMenu {
       { class: "account-menu", "aria-label": `Account ${name}` },
       element("p", { class: "account-name" }, name),
       this.#item("edit", "Change password", "change-password", () => void this.#changePassword()),
+      ...(AlertNotifications.arePossible ? [this.#notifications()] : []),
       this.#item("logout", "Log out", "log-out", () => this.#logOut()),
     );
     this.root.addEventListener("click", (event) => event.target === this.root && this.root.close());
@@ -49,6 +51,17 @@ export class AccountMenu {
       onClick();
     });
     return item;
+  }
+
+  #notifications(): HTMLElement {
+    const notifications = new AlertNotifications(this.#session.account.user_id);
+    const box = element("input", { type: "checkbox", checked: notifications.areOn });
+    box.addEventListener("change", async () => {
+      if (!box.checked) return notifications.turnOff();
+      box.checked = await notifications.turnOn();
+      if (!box.checked) notify("The browser does not allow notifications from this site. Its settings for the site do.");
+    });
+    return element("label", { class: "account-item" }, box, "Notify me of alerts");
   }
 
   #logOut(): void {
