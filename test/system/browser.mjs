@@ -13,8 +13,8 @@ await visit(async (page, complaints) => {
   await page.locator('[data-camera="1"][data-state="live"]').waitFor({ timeout: 15_000 });
   await page.locator('[data-camera="4"][data-state="live"]').waitFor({ timeout: 15_000 });
   await page.screenshot({ path: `${folder}/wall.png` });
-  // The clock of the test pattern shows tenths at least; three pictures a second apart, so that one repeated by chance is not taken
-  // for standing still.
+  // The clock of the test pattern shows tenths at least; three pictures a second apart, so that one repeated by chance
+  // is not taken for standing still.
   const shots = [];
   for (let shot = 0; shot < 3; shot += 1) {
     shots.push((await tile.locator("canvas").screenshot()).toString("base64"));

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits for a
-// line before each step and writes a line of JSON after it, so that the caller can look at the server in between.
+// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits
+// for a line before each step and writes a line of JSON after it, so that the caller can look at the server in between.
 import { readFileSync } from "node:fs";
 import { createRequire } from "node:module";
 import { createInterface } from "node:readline";

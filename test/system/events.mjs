@@ -1,15 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a jump;
-// marks by their addresses, and on to the event after. EVENT_START and EVENT_MIDDLE are Unix seconds of a recording of camera 1,
-// MARKS are addresses of marks within its recordings.
+// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a
+// jump; marks by their addresses, and on to the event after. EVENT_START and EVENT_MIDDLE are Unix seconds of a
+// recording of camera 1, MARKS are addresses of marks within its recordings.
 import { address, folder, logIn, report, visit } from "./chromium.mjs";
 
 const start = Number(process.env.EVENT_START);
 const middle = Number(process.env.EVENT_MIDDLE);
 
 await visit(async (page, complaints) => {
-  /** Waits for one of the states; the page shows what a click changed with the next picture of the screen at the latest. */
+  /**
+   * Waits for one of the states; the page shows what a click changed with the next picture of the screen at the latest.
+   */
   const settled = async (...states) => {
     await page.evaluate(() => new Promise((resolve) => requestAnimationFrame(() => requestAnimationFrame(resolve))));
     await page.locator(states.map((state) => `.stage-picture:first-of-type[data-state="${state}"]`).join()).waitFor({ timeout: 15_000 });
@@ -37,8 +39,8 @@ await visit(async (page, complaints) => {
     const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
     return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time.slice(0, 8)}`) / 1000 + Number(time.slice(8));
   };
-  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, go on towards the
-  // seconds with the wheel, and look again.
+  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, go on
+  // towards the seconds with the wheel, and look again.
   let x = box.width / 2;
   let scale;
   const aim = async () => {

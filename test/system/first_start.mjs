@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to an installation without an account, on a phone: by a one-time address to an account, a first camera, and storage. TOKEN
-// is valid, OLD is not; CAMERA is the camera's address. At each step, what axe-core finds.
+// One visit to an installation without an account, on a phone: by a one-time address to an account, a first camera, and
+// storage. TOKEN is valid, OLD is not; CAMERA is the camera's address. At each step, what axe-core finds.
 import { address, folder, report, violations, visit } from "./chromium.mjs";
 
 await visit(async (page, complaints) => {

@@ -2,9 +2,9 @@
 //
 // A visit to a camera with picture and sound: watched muted, then heard, then in a hidden tab, then seen again.
 //
-// Why so        What is drawn is measured on the canvas, not asked of the client: the light that runs along the lower edge
-//               of the test pattern tells the time at which a picture was made, and sound is taken where it leaves the
-//               page. LOOKHAVEN_WATCH_MS is how long each measurement takes.
+// Why so        What is drawn is measured on the canvas, not asked of the client: the light that runs along the lower
+//               edge of the test pattern tells the time at which a picture was made, and sound is taken where it leaves
+//               the page. LOOKHAVEN_WATCH_MS is how long each measurement takes.
 import { address, logIn, report, visit } from "./chromium.mjs";
 
 const watchMs = Number(process.env.LOOKHAVEN_WATCH_MS ?? 6000);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit that sets up without a shell: a camera of the network with its picture first and a plan, and an account that sees
-// it alone, without its sound. CAMERA is the camera's address.
+// One visit that sets up without a shell: a camera of the network with its picture first and a plan, and an account
+// that sees it alone, without its sound. CAMERA is the camera's address.
 import { address, folder, logIn, password, report, visit } from "./chromium.mjs";
 
 const kWord = "a long night";

@@ -2,8 +2,8 @@
 //
 // Keeps the stream of what is being reported open, and goes on where it was after each loss of the connection.
 //
-// Why so        Over HTTP/1.1 a stream would hold one of the browser's six connections for good. There it is opened every
-//               few seconds instead, and closed when it has told what was missed.
+// Why so        Over HTTP/1.1 a stream would hold one of the browser's six connections for good. There it is opened
+//               every few seconds instead, and closed when it has told what was missed.
 
 import { Deadline } from "../wire/deadline";
 import { delay } from "../wire/delay";

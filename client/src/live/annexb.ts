@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads from an H.264 or H.265 frame in Annex B format what a decoder has to be told: whether it is a key frame, and the
-// codec string.
+// Reads from an H.264 or H.265 frame in Annex B format what a decoder has to be told: whether it is a key frame, and
+// the codec string.
 //
-// Why so        The stream does not mark key frames, and a decoder can only start at one (IDR, or the random access frames
-//               of H.265); so the types of the NAL units are read from their first byte.
+// Why so        The stream does not mark key frames, and a decoder can only start at one (IDR, or the random access
+//               frames of H.265); so the types of the NAL units are read from their first byte.
 
 export type VideoCodec = "H264" | "H265";
 

@@ -2,8 +2,8 @@
 //
 // Keeps video in sync with audio: the clock of what is audible, and the decoded frames that wait for it.
 //
-// Why so        The ear notices a gap, the eye hardly a dropped frame. So the audio plays through, and the video follows it.
-//               Without audio each frame is shown at once.
+// Why so        The ear notices a gap, the eye hardly a dropped frame. So the audio plays through, and the video
+//               follows it. Without audio each frame is shown at once.
 
 /** Reports come about twenty times a second while audio plays. */
 const kReportLimitMs = 500;
@@ -88,8 +88,8 @@ export class FrameQueue<Frame extends Timed> {
   }
 
   /**
-   * The frame to show at `audibleUs` (null: nothing is audible, so the newest); null while none is due. Closes the frames
-   * that it overtakes; the caller closes the one returned.
+   * The frame to show at `audibleUs` (null: nothing is audible, so the newest); null while none is due. Closes the
+   * frames that it overtakes; the caller closes the one returned.
    */
   take(audibleUs: number | null, nowMs: number): Frame | null {
     const isDue = ({ timestamp }: Frame) =>

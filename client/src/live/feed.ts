@@ -16,7 +16,9 @@ export class Feed {
   #run: AbortController | null = null;
   #failure: ServerError | null = null;
 
-  /** `show` draws and closes a frame; `changed` is called when the state may have changed by something other than time. */
+  /**
+   * `show` draws and closes a frame; `changed` is called when the state may have changed by something other than time.
+   */
   constructor(show: (frame: Frame) => void, changed: () => void) {
     this.#show = show;
     this.#changed = changed;

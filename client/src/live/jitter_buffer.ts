@@ -2,13 +2,14 @@
 //
 // Holds decoded audio for as long as it takes to play it without gaps, although it comes in bursts.
 //
-// Algorithm     Nothing plays until the target amount is buffered. Then samples go out at the rate they came in, inaudibly
-//               faster or slower, by one per cent, where the amount grows or shrinks, since no two clocks agree. Where it
-//               grows all the same, the oldest is dropped, so that audio is never late by more than a moment.
+// Algorithm     Nothing plays until the target amount is buffered. Then samples go out at the rate they came in,
+//               inaudibly faster or slower, by one per cent, where the amount grows or shrinks, since no two clocks
+//               agree. Where it grows all the same, the oldest is dropped, so that audio is never late by more than a
+//               moment.
 //
-// Target        One chunk, since the next comes only when it is complete, and what the network and two threads add. After an
-//               underrun it grows; after half a minute without one it shrinks again, so that one bad moment does not
-//               delay video and audio for hours.
+// Target        One chunk, since the next comes only when it is complete, and what the network and two threads add.
+//               After an underrun it grows; after half a minute without one it shrinks again, so that one bad moment
+//               does not delay video and audio for hours.
 
 export interface AudioChunk {
   /** Stream time of the first sample, µs. */
@@ -59,7 +60,10 @@ export class JitterBuffer {
     if (this.#bufferedMs() > this.#targetMs() + kMaxSurplusMs) this.#discard(this.#bufferedMs() - this.#targetMs());
   }
 
-  /** Fills the arrays, one an output channel, with the next samples. Returns the stream time of the first; null for silence. */
+  /**
+   * Fills the arrays, one an output channel, with the next samples. Returns the stream time of the first; null for
+   * silence.
+   */
   pull(output: Float32Array[]): number | null {
     for (const channel of output) channel.fill(0);
     const bufferedMs = this.#bufferedMs();
@@ -92,7 +96,9 @@ export class JitterBuffer {
     this.#postponedMs = postponedMs;
   }
 
-  /** The last chunk brings up to its length too much, which would delay audio and video for good. More is of a burst. */
+  /**
+   * The last chunk brings up to its length too much, which would delay audio and video for good. More is of a burst.
+   */
   #begin(surplusMs: number): void {
     const first = this.#chunks[0];
     if (!first || surplusMs < 0) return;

@@ -2,9 +2,9 @@
 //
 // Decides whether what a tile shows is live.
 //
-// Why so        A frozen picture that looks live is the worst thing a tile can show. So only a new picture, recognised by its
-//               capture time and its age, keeps a tile live: not an open connection, nor a part that repeats the last
-//               picture, nor an old picture delivered late.
+// Why so        A frozen picture that looks live is the worst thing a tile can show. So only a new picture, recognised
+//               by its capture time and its age, keeps a tile live: not an open connection, nor a part that repeats the
+//               last picture, nor an old picture delivered late.
 // Invariants    (1) `live` means: the newest picture was captured less than the limit ago.
 //               (2) Only a new picture or `end` leaves `lost`, never an attempt to reconnect.
 

@@ -17,8 +17,8 @@ export interface LiveSource {
   /** Of a source that polls for pictures; 0 for a stream. */
   readonly pollIntervalMs: number;
   /**
-   * Shows pictures until `signal` is aborted or the connection ends (both resolve) or fails (rejects with a ServerError).
-   * May be called again after that.
+   * Shows pictures until `signal` is aborted or the connection ends (both resolve) or fails (rejects with a
+   * ServerError). May be called again after that.
    */
   run(show: (frame: Frame) => void, signal: AbortSignal): Promise<void>;
 }

@@ -2,11 +2,12 @@
 //
 // Live pictures of a camera out of one endless multipart answer: JPEG pictures, or compressed picture and sound.
 //
-// Why so        An image element would show JPEG streams with less code, but tells neither when a picture was captured nor
-//               that the stream has ended. Here each part is known, and a JPEG picture that comes while another is being
-//               decoded replaces any that waits: a slow viewer sees fewer pictures, never older ones.
+// Why so        An image element would show JPEG streams with less code, but tells neither when a picture was captured
+//               nor that the stream has ended. Here each part is known, and a JPEG picture that comes while another is
+//               being decoded replaces any that waits: a slow viewer sees fewer pictures, never older ones.
 //
-//               A stream that cannot be played here is closed, and still pictures are asked for in its place for a while.
+//               A stream that cannot be played here is closed, and still pictures are asked for in its place for a
+//               while.
 
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
@@ -63,7 +64,9 @@ export class StreamSource implements LiveSource {
   #unplayable: Unplayable | null;
   #retryAtMs = 0;
 
-  /** `small` asks for the small picture, if the camera has one; `stills` stands in for a stream that cannot be played. */
+  /**
+   * `small` asks for the small picture, if the camera has one; `stills` stands in for a stream that cannot be played.
+   */
   constructor(server: Server, camera: Camera, small: boolean, stills: LiveSource, audio: AudioPlayer | null = null) {
     this.#server = server;
     this.#camera = camera;

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The events before and after the one that is open, as the user has filtered them; known before they are asked for, so that
-// the controls can say what comes next.
+// The events before and after the one that is open, as the user has filtered them; known before they are asked for, so
+// that the controls can say what comes next.
 
 import type { Footage } from "../wire/footage";
 import type { EventCursor, Recordings } from "../wire/recordings";
@@ -54,7 +54,10 @@ export class EventWalk {
     );
   }
 
-  /** As peek, but waits for the answer; nothing at the end is asked for anew, since recording goes on. Rejects with a ServerError. */
+  /**
+   * As peek, but waits for the answer; nothing at the end is asked for anew, since recording goes on. Rejects with a
+   * ServerError.
+   */
   async find(by: Direction): Promise<Footage | null> {
     const known = this.peek(by);
     if (known) return known;

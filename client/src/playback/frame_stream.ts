@@ -2,8 +2,8 @@
 //
 // Reads the frames of a recording's stream: of each a part with its number, then one with the picture.
 //
-// Why so        The next frames are read only when the last was taken. So a slow screen holds the server back through the
-//               connection, and the number that is shown is that of the frame on the screen.
+// Why so        The next frames are read only when the last was taken. So a slow screen holds the server back through
+//               the connection, and the number that is shown is that of the frame on the screen.
 
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
@@ -18,8 +18,8 @@ export interface RecordedFrame {
 
 /**
  * Opens a stream and hands its frames to `take` until that returns false, the stream ends (both resolve) or fails
- * (rejects with a ServerError, of status 0 when the connection was lost or nothing came for `maxSilenceMs`). Ends at once
- * when `owner` is aborted.
+ * (rejects with a ServerError, of status 0 when the connection was lost or nothing came for `maxSilenceMs`). Ends at
+ * once when `owner` is aborted.
  */
 export async function readFrames(
   open: (signal: AbortSignal) => Promise<Response>,

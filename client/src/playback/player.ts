@@ -2,13 +2,13 @@
 //
 // Plays one recording after another in one place on the screen: play, pause, step, seek, rate.
 //
-// Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream, and
-//               every seek opens another. While paused there is no connection at all. A held key or a dragged playhead asks
-//               for more frames than can be fetched: then only the last is.
+// Why so        The server streams from any frame on, and knows neither pause nor seek: so a pause closes the stream,
+//               and every seek opens another. While paused there is no connection at all. A held key or a dragged
+//               playhead asks for more frames than can be fetched: then only the last is.
 //
-//               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That of a
-//               growing recording continues as it grows, and ends with it. Where the connection is lost, another stream goes on
-//               from the frame on the screen.
+//               The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That
+//               of a growing recording continues as it grows, and ends with it. Where the connection is lost, another
+//               stream goes on from the frame on the screen.
 
 import { delay } from "../wire/delay";
 import { isSameFootage, type Footage } from "../wire/footage";
@@ -83,7 +83,9 @@ export class Player {
     return this.#frameCount;
   }
 
-  /** Unix milliseconds at which the frame on the screen was taken; before the first one, of the time that was asked for. */
+  /**
+   * Unix milliseconds at which the frame on the screen was taken; before the first one, of the time that was asked for.
+   */
   get timeMs(): number {
     return this.#shown.capturedMs;
   }
@@ -116,7 +118,8 @@ export class Player {
 
   pause(): void {
     if (!["playing", "opening", "lost"].includes(this.#state.kind)) return;
-    // Before the first frame there is no picture yet that could stay. A still that is being fetched is as good as a pause.
+    // Before the first frame there is no picture yet that could stay. A still that is being fetched is as good as a
+    // pause.
     if (this.#opening) return this.#showStill(this.#opening);
     if (this.#fetching) return;
     this.#begin();

@@ -8,7 +8,9 @@ export type PlayerState =
   | { kind: "opening" | "playing" | "paused" | "ended" }
   /** The server ended the stream before its end: another player of this session has taken over. */
   | { kind: "preempted" }
-  /** The connection was lost while playing; it is tried again until it is back, and goes on at the frame on the screen. */
+  /**
+   * The connection was lost while playing; it is tried again until it is back, and goes on at the frame on the screen.
+   */
   | { kind: "lost" }
   | { kind: "failed"; reason: string };
 

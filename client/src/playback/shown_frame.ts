@@ -2,8 +2,8 @@
 //
 // Which frame is on the screen, and what time it is there.
 //
-// Why so        The caption tells when the picture was taken. A slow camera's picture is repeated each second until the next
-//               comes: the playhead goes on meanwhile.
+// Why so        The caption tells when the picture was taken. A slow camera's picture is repeated each second until the
+//               next comes: the playhead goes on meanwhile.
 
 import type { RecordedFrame } from "./frame_stream";
 

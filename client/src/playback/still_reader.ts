@@ -2,8 +2,8 @@
 //
 // Fetches single frames of a recording.
 //
-// Why so        A frame is decoded from the key frame before it on. So a step back keeps the frames that are passed for the
-//               steps after it.
+// Why so        A frame is decoded from the key frame before it on. So a step back keeps the frames that are passed for
+//               the steps after it.
 
 import type { Footage } from "../wire/footage";
 import { newStreamKey, type FrameStart, type Recordings } from "../wire/recordings";
@@ -23,7 +23,10 @@ export class StillReader {
     this.#cached.clear();
   }
 
-  /** Hands the frame to `show`. Rejects with a ServerError when it does not come; resolves early when `signal` is aborted. */
+  /**
+   * Hands the frame to `show`. Rejects with a ServerError when it does not come; resolves early when `signal` is
+   * aborted.
+   */
   async read(
     footage: Footage,
     start: FrameStart,

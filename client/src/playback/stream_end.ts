@@ -2,8 +2,8 @@
 //
 // What it means that the server has ended a stream.
 //
-// Why so        The server cannot be asked whether this player was preempted, so that is concluded from how the stream ended:
-//               at the tail of what is still being recorded the server waits for more, and only then ends it.
+// Why so        The server cannot be asked whether this player was preempted, so that is concluded from how the stream
+//               ended: at the tail of what is still being recorded the server waits for more, and only then ends it.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";

@@ -33,7 +33,10 @@ export class SyncPlayback {
   /** When a track was last brought to the playhead, and where the playhead was. */
   readonly #joined = new WeakMap<Track, { clockMs: number; atMs: number }>();
 
-  /** `changed` is called whenever there is something else to show; `skipped` when playing leaves out a gap of that length. */
+  /**
+   * `changed` is called whenever there is something else to show; `skipped` when playing leaves out a gap of that
+   * length.
+   */
   constructor(recordings: Recordings, cache: FootageCache, changed: () => void, skipped: (seconds: number) => void) {
     this.#tracks = new Tracks(recordings, (track) => this.#follow(track));
     this.#lookup = new FootageLookup(recordings, cache);

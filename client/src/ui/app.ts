@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Goes from the log-in, or the first account, to the screens, from screen to screen as the address says, and back to the log-in.
+// Goes from the log-in, or the first account, to the screens, from screen to screen as the address says, and back to
+// the log-in.
 
 import { watchAlerts } from "../live/alert_watch";
 import { streamLimit } from "../live/stream_budget";

@@ -137,7 +137,10 @@ export class CameraSetup {
     return (await this.#call<{ camera: CameraRecord }>("Add", added)).camera;
   }
 
-  /** Without `password` the stored one stays; empty: none. Rejects with status 409 and the record where `revision` is stale. */
+  /**
+   * Without `password` the stored one stays; empty: none. Rejects with status 409 and the record where `revision` is
+   * stale.
+   */
   async set(
     id: number,
     revision: number,

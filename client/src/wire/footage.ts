@@ -2,7 +2,10 @@
 //
 // What can be played, recordings and marks: as the client has them, and as the web API does.
 
-/** Event: a recording on disk. Alert and pos: a mark reported by analytics or a POS terminal, with the recordings of its span. */
+/**
+ * Event: a recording on disk. Alert and pos: a mark reported by analytics or a POS terminal, with the recordings of its
+ * span.
+ */
 export type FootageKind = "event" | "alert" | "pos";
 
 export interface FootageRef {

@@ -66,8 +66,8 @@ export class Mounts {
   }
 
   /**
-   * Where the new limits would delete recordings nothing changes and the loss comes back, unless `confirm`. Rejects with status
-   * 409 and the record where `revision` is stale.
+   * Where the new limits would delete recordings nothing changes and the loss comes back, unless `confirm`. Rejects
+   * with status 409 and the record where `revision` is stale.
    */
   set(
     id: number,

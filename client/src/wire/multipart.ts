@@ -2,9 +2,9 @@
 //
 // Splits an endless multipart body into its parts as it arrives, in whatever chunks.
 //
-// Why so        A picture may contain the boundary by chance, and searching every picture for it costs time. So a body is
-//               taken by its Content-Length, straight into an array of that size; only the few lines between two bodies
-//               are read as text.
+// Why so        A picture may contain the boundary by chance, and searching every picture for it costs time. So a body
+//               is taken by its Content-Length, straight into an array of that size; only the few lines between two
+//               bodies are read as text.
 // Invariants    (1) Memory is bounded by the two limits, whatever the sender says.
 //               (2) A part is delivered as soon as its last byte is here, before the boundary that follows it.
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The code by which two hosts are paired, as the server has it (standalone/remote/pairing_code.h): 32 digits of base 32, of
-// which the last 16 bits are a checksum.
+// The code by which two hosts are paired, as the server has it (standalone/remote/pairing_code.h): 32 digits of base
+// 32, of which the last 16 bits are a checksum.
 
 const kDigits = "0123456789ABCDEFGHJKMNPQRSTVWXYZ";
 const kLength = 32;

@@ -130,7 +130,9 @@ export class Recordings {
     return answer.event.map(markOf);
   }
 
-  /** Alerts and POS transactions, of one kind or of both, with all of the words in their texts: the newest of all time. */
+  /**
+   * Alerts and POS transactions, of one kind or of both, with all of the words in their texts: the newest of all time.
+   */
   async search(words: string, cameras: readonly number[], kind?: "alert" | "pos"): Promise<Footage[]> {
     const { event } = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", {
       text: words,

@@ -178,7 +178,8 @@ export class Server {
   }
 
   /**
-   * Opens a live stream; the caller reads its body and ends it with `signal`. `profile` null means the camera's own choice.
+   * Opens a live stream; the caller reads its body and ends it with `signal`. `profile` null means the camera's own
+   * choice.
    */
   async live(camera: Camera, profile: number | null, signal: AbortSignal): Promise<Response> {
     const more: Record<string, string> = profile === null ? {} : { profileType: String(profile) };
@@ -203,8 +204,8 @@ export class Server {
   }
 
   /**
-   * The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported. `signal`
-   * ends the request.
+   * The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported.
+   * `signal` ends the request.
    */
   async call<Data>(
     api: string,

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The installation as a whole: what is wrong with it and what to do, its parts, and what holds for all of it. For managers
-// only.
+// The installation as a whole: what is wrong with it and what to do, its parts, and what holds for all of it. For
+// managers only.
 
 import type { Server } from "./server";
 
@@ -115,7 +115,10 @@ export class System {
     return (await this.#server.call<{ confirm: OfferedCertificate }>(kApi, "SetCertificate", {}, { json: offer })).confirm;
   }
 
-  /** `reloaded`: the web server runs and shows it. Rejects with status 502 where it refuses: then the one from before is back. */
+  /**
+   * `reloaded`: the web server runs and shows it. Rejects with status 502 where it refuses: then the one from before is
+   * back.
+   */
   async setCertificate(offer: CertificateOffer, reauth: string): Promise<{ reloaded: boolean }> {
     const options = { json: { ...offer, confirm: true, reauth }, timeoutMs: kReloadTimeoutMs };
     return (await this.#server.call<{ certificate: { reloaded: boolean } }>(kApi, "SetCertificate", {}, options)).certificate;

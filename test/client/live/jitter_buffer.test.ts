@@ -4,7 +4,9 @@
 
 import { JitterBuffer } from "../../../client/src/live/jitter_buffer";
 
-/** Plays pieces of 20 ms at 8 kHz, of which each sample is its own number; returns what `pull` gave, 10 ms at a time. */
+/**
+ * Plays pieces of 20 ms at 8 kHz, of which each sample is its own number; returns what `pull` gave, 10 ms at a time.
+ */
 class Player {
   readonly buffer: JitterBuffer;
   #pushed = 0;

@@ -13,8 +13,8 @@ const kUntrustedName = "--host-resolver-rules=MAP lan.test 127.0.0.1";
 export const hasBrowser = existsSync(executablePath);
 
 /**
- * Make one in a describe block: it starts before the tests there and ends after them. After each, its pages are closed, no
- * stream may be left, and nothing may have been complained of.
+ * Make one in a describe block: it starts before the tests there and ends after them. After each, its pages are closed,
+ * no stream may be left, and nothing may have been complained of.
  */
 export class ServedClient {
   readonly server = new FakeServer();

@@ -12,8 +12,8 @@ import { signalText } from "../widgets/text";
 import { unplayableHint } from "./unplayable_hint";
 
 /**
- * Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. Absent: the
- * server does not list the camera any more.
+ * Unavailable: the stream cannot be played here, and the server makes no still pictures to show in its place. Absent:
+ * the server does not list the camera any more.
  */
 export type PictureState = SignalState | { kind: "unavailable"; reason: string } | { kind: "absent"; reason: string };
 

@@ -10,7 +10,10 @@ import type { EventList } from "./event_list";
 /** The list is for reading: a longer one is cut, and says so. */
 const kMaxRows = 20_000;
 
-/** `recorded` is what the chosen cameras have, whatever its kind; `whyNone` is told where the filter leaves nothing of it. */
+/**
+ * `recorded` is what the chosen cameras have, whatever its kind; `whyNone` is told where the filter leaves nothing of
+ * it.
+ */
 export function listEvents(
   list: EventList,
   filter: EventFilter,
@@ -26,7 +29,9 @@ export function listEvents(
   list.show(rows.slice(0, kMaxRows), head, note);
 }
 
-/** Why no event is listed, and what to do about it; `hidden` are there but filtered out. Empty while that is not known. */
+/**
+ * Why no event is listed, and what to do about it; `hidden` are there but filtered out. Empty while that is not known.
+ */
 export function whyNoEvents(filter: EventFilter, hidden: number, calendar: Calendar): string {
   if (filter.cameras.length === 0) return "No camera is chosen. Choose some under “Cameras”.";
   if (hidden > 0) return `The filter hides ${hidden === 1 ? "one event" : `${hidden} events`}. Choose more kinds, or not only kept ones, to see them.`;

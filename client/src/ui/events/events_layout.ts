@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Where the parts of the events' screen are. Where there is no room for all of them, the player stays, and below it is the
-// one that the user has chosen.
+// Where the parts of the events' screen are. Where there is no room for all of them, the player stays, and below it is
+// the one that the user has chosen.
 
 import { iconButton } from "../widgets/button";
 import { Choice } from "../widgets/choice";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What was recorded when, of the cameras that the user has chosen: filter, calendar, timeline and list, filled from one cache.
+// What was recorded when, of the cameras that the user has chosen: filter, calendar, timeline and list, filled from one
+// cache.
 
 import { FootageCache } from "../../playback/footage_cache";
 import { RecordedDays } from "../../playback/recorded_days";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The field for words in the texts of alerts and POS transactions, and what was found of the chosen cameras at any time.
+// The field for words in the texts of alerts and POS transactions, and what was found of the chosen cameras at any
+// time.
 
 import { kEventKinds, type EventKind } from "../../playback/coverage";
 import type { Footage } from "../../wire/footage";

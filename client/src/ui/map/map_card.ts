@@ -30,8 +30,8 @@ export class MapCard {
   }
 
   /**
-   * Shows the item at its place. `camera` is what can be seen of it; `open`, where it is given, what a button opens: such a
-   * card stays until it is hidden.
+   * Shows the item at its place. `camera` is what can be seen of it; `open`, where it is given, what a button opens:
+   * such a card stays until it is hidden.
    */
   show(view: MapItemView, camera: Camera | null, sinceS: number, open: (() => void) | null): void {
     if (this.#shown === view && !this.isPinned && !open) return;

@@ -49,7 +49,10 @@ export class MapEditor {
   #placeable: Placeable[] = [];
   #selected = -1;
 
-  /** `draft` is what an earlier editor of this map left unsaved. `onDone` is called when the user wants to see the map again. */
+  /**
+   * `draft` is what an earlier editor of this map left unsaved. `onDone` is called when the user wants to see the map
+   * again.
+   */
   constructor(emaps: Emaps, map: EditedMap, draft: EditedMap | null, picture: Blob | null, onDone: () => void) {
     this.#emaps = emaps;
     this.#onDone = onDone;

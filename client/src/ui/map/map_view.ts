@@ -2,8 +2,9 @@
 //
 // A map's picture with its items, zoomed and panned with wheel, fingers and keys.
 //
-// Why so        Items keep their size whatever the zoom, so they lie over the picture and not in it. Where each one lies is
-//               left to the style sheet, which gets three numbers for each zoom or pan, however many items there are.
+// Why so        Items keep their size whatever the zoom, so they lie over the picture and not in it. Where each one
+//               lies is left to the style sheet, which gets three numbers for each zoom or pan, however many items
+//               there are.
 
 import type { MapFlags, MapItem } from "../../wire/emaps";
 import { element } from "../widgets/dom";

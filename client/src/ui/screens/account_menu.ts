@@ -22,8 +22,8 @@ export class AccountMenu {
   readonly #showBusy: (isBusy: boolean) => void;
 
   /**
-   * Logs nobody out where `canLeave` returns false. `showBusy` is called when a log-out begins (true) and when it failed
-   * (false).
+   * Logs nobody out where `canLeave` returns false. `showBusy` is called when a log-out begins (true) and when it
+   * failed (false).
    */
   constructor(session: Session, canLeave: () => boolean, showBusy: (isBusy: boolean) => void) {
     this.#session = session;

@@ -6,7 +6,9 @@ import { Backoff } from "../../live/backoff";
 import { delay } from "../../wire/delay";
 import { asServerError } from "../../wire/server";
 
-/** The answer; undefined once `signal` is aborted. `failed` gets a sentence for the user after each attempt that failed. */
+/**
+ * The answer; undefined once `signal` is aborted. `failed` gets a sentence for the user after each attempt that failed.
+ */
 export async function keepTrying<Answer>(
   ask: () => Promise<Answer>,
   failed: (sentence: string) => void,

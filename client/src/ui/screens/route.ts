@@ -6,8 +6,8 @@
 // with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
 // one-time token.
 //
-// Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the browser's
-//               history has a number, by which a refused step is taken back.
+// Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the
+//               browser's history has a number, by which a refused step is taken back.
 
 import type { Camera } from "../../wire/server";
 
@@ -134,7 +134,9 @@ export function editedMapAddress(map: number): string {
   return `#map=${map}&edit`;
 }
 
-/** Opens a map, or a camera over it. Each is an entry in the history, so that Back leads along the way that one came. */
+/**
+ * Opens a map, or a camera over it. Each is an entry in the history, so that Back leads along the way that one came.
+ */
 export function showMap(map: number, camera: OpenMap["camera"] = null): void {
   const of = camera ? `&camera=${camera.id}${camera.server ? `@${camera.server}` : ""}` : "";
   push(`#map=${map}${of}`, true);

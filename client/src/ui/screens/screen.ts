@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every screen of a logged-in user has: title and heading, the bar with navigation, clock and account, the progress
-// line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may leave.
+// What every screen of a logged-in user has: title and heading, the bar with navigation, clock and account, the
+// progress line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may
+// leave.
 
 import type { Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
@@ -52,8 +53,8 @@ export abstract class Screen {
   }
 
   /**
-   * Whether the user may leave what is shown; an override may ask. Called before a link of the navigation, Back, Forward or
-   * log-out takes effect; not when the session has ended.
+   * Whether the user may leave what is shown; an override may ask. Called before a link of the navigation, Back,
+   * Forward or log-out takes effect; not when the session has ended.
    */
   canLeave(): boolean {
     return true;
@@ -92,8 +93,8 @@ export abstract class Screen {
   protected abstract get keys(): KeyList;
 
   /**
-   * Does what a key without Ctrl, Alt or Meta asks for; returns false for one that means nothing here. Not called for a key
-   * that belongs to what has the focus.
+   * Does what a key without Ctrl, Alt or Meta asks for; returns false for one that means nothing here. Not called for a
+   * key that belongs to what has the focus.
    */
   protected abstract pressKey(event: KeyboardEvent): boolean;
 
@@ -106,7 +107,10 @@ export abstract class Screen {
   }
 }
 
-/** Keys, account and forms keep the screen's keys out, wherever a click has left the focus; a screen's own dialog does not. */
+/**
+ * Keys, account and forms keep the screen's keys out, wherever a click has left the focus; a screen's own dialog does
+ * not.
+ */
 function isCovered(): boolean {
   return document.querySelector("dialog:is(.keys, .account-menu)[open]") !== null;
 }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What stands in place of the log-in while there is no account: with a one-time address the form that makes the first one,
-// else how to get such an address.
+// What stands in place of the log-in while there is no account: with a one-time address the form that makes the first
+// one, else how to get such an address.
 
 import { asServerError, type Account, type Server } from "../../wire/server";
 import { accountNameProblem, passwordProblem } from "../widgets/credentials";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Leads whoever has just made the first account through the settings: the first camera, then storage. Each can be skipped.
+// Leads whoever has just made the first account through the settings: the first camera, then storage. Each can be
+// skipped.
 
 import { element } from "../widgets/dom";
 import { settingsAddress, type OpenSettings } from "./route";

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the pages of the settings have in common: how the screen deals with them, and how they look while there is nothing to
-// show.
+// What the pages of the settings have in common: how the screen deals with them, and how they look while there is
+// nothing to show.
 
 import { asServerError, type Account, type Server, type ServerError } from "../../wire/server";
 import { keepTrying } from "../screens/keep_trying";

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The form of one record: knows whether it was changed, saves it, and where someone else has changed the record meanwhile,
-// shows both and lets the user choose.
+// The form of one record: knows whether it was changed, saves it, and where someone else has changed the record
+// meanwhile, shows both and lets the user choose.
 
 import { asServerError } from "../../wire/server";
 import { button } from "../widgets/button";

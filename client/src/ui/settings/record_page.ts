@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The page of one record, or of a new one: its form, what stands above and below that, and the way back to the list of all.
-// Cameras, accounts and mounts differ in their fields, and in how they are saved.
+// The page of one record, or of a new one: its form, what stands above and below that, and the way back to the list of
+// all. Cameras, accounts and mounts differ in their fields, and in how they are saved.
 
 import { settingsAddress, type SettingsSection } from "../screens/route";
 import { button } from "../widgets/button";

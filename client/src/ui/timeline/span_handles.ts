@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The chosen span on the timeline, with a handle at either end: dragged, or moved by a second with the arrow keys, with Shift by
-// a minute.
+// The chosen span on the timeline, with a handle at either end: dragged, or moved by a second with the arrow keys, with
+// Shift by a minute.
 
 import { element } from "../widgets/dom";
 import { clockTime, shortDate } from "../widgets/text";

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recordings of the cameras as lanes below a common axis: wheel, pinch and keys zoom, a drag pans, a click plays, and the
-// playhead is dragged along the axis.
+// The recordings of the cameras as lanes below a common axis: wheel, pinch and keys zoom, a drag pans, a click plays,
+// and the playhead is dragged along the axis.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
 import type { FootageCache } from "../../playback/footage_cache";

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Cameras that were on the wall and that the server no longer lists, and why: their tiles stay, grey, until the user takes
-// them off. A camera that vanishes without a word would be missed by nobody.
+// Cameras that were on the wall and that the server no longer lists, and why: their tiles stay, grey, until the user
+// takes them off. A camera that vanishes without a word would be missed by nobody.
 
 import type { Camera, CameraList } from "../../wire/server";
 

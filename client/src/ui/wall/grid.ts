@@ -2,7 +2,8 @@
 //
 // The tiles of all cameras: arranges them, and lets those stream that are visible.
 //
-// Invariants    (1) A tile that nobody can see (scrolled away, behind the large view, in a hidden tab) has no connection.
+// Invariants    (1) A tile that nobody can see (scrolled away, behind the large view, in a hidden tab) has no
+//               connection.
 //               (2) Never more tiles stream than the connection to the server carries.
 
 import { chooseStreams, streamLimit } from "../../live/stream_budget";

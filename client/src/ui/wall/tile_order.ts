@@ -29,8 +29,8 @@ function storedOrder(): number[] {
 }
 
 /**
- * Lets the mouse drag the children of `grid` to other places; a finger scrolls instead. `moved` is called when one is dropped
- * elsewhere. The click at the end of a drag is none.
+ * Lets the mouse drag the children of `grid` to other places; a finger scrolls instead. `moved` is called when one is
+ * dropped elsewhere. The click at the end of a drag is none.
  */
 export function dragToOrder(grid: HTMLElement, moved: () => void): void {
   grid.addEventListener("pointerdown", (pressed) => {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The fields of forms: each has its label, a hint where one helps, and a value that can be read and shown. Their changes
-// reach the form as the browser's own "input" events.
+// The fields of forms: each has its label, a hint where one helps, and a value that can be read and shown. Their
+// changes reach the form as the browser's own "input" events.
 
 import type { Named } from "../../wire/camera_setup";
 import { element } from "./dom";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A dialog with a form that is tried until it succeeds or the user gives up: what was typed stays where the server refuses.
+// A dialog with a form that is tried until it succeeds or the user gives up: what was typed stays where the server
+// refuses.
 
 import { asServerError } from "../../wire/server";
 import { iconButton } from "./button";
@@ -12,13 +13,15 @@ export interface DialogForm {
   content: (Node | string)[];
   /** Empty where there is only something to read. */
   submit: string;
-  /** Done when it resolves; what it rejects with is shown in the dialog. A sentence that it returns is shown as well. */
+  /**
+   * Done when it resolves; what it rejects with is shown in the dialog. A sentence that it returns is shown as well.
+   */
   attempt(): Promise<string | void>;
 }
 
 /**
- * `host` is what the dialog goes away with. Resolves with whether the attempt succeeded, once the dialog is closed; never where
- * it went away.
+ * `host` is what the dialog goes away with. Resolves with whether the attempt succeeded, once the dialog is closed;
+ * never where it went away.
  */
 export function openDialog(host: HTMLElement, { title, content, submit, attempt }: DialogForm): Promise<boolean> {
   const message = element("p", { class: "form-message", role: "alert" });

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The whole page goes full screen, so that the user can go from camera to camera there; the style sheets leave only pictures.
+// The whole page goes full screen, so that the user can go from camera to camera there; the style sheets leave only
+// pictures.
 
 import { iconButton } from "./button";
 

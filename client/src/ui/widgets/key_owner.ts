@@ -2,8 +2,8 @@
 //
 // Whether a key belongs to the control that has the focus, or is free for the screen's shortcuts.
 //
-// Why so        A click leaves the focus on what was clicked. Whoever then presses Space means the picture, not the button once
-//               more; whoever came to the button with Tab means the button.
+// Why so        A click leaves the focus on what was clicked. Whoever then presses Space means the picture, not the
+//               button once more; whoever came to the button with Tab means the button.
 
 const kNoText = /^(checkbox|radio|button|submit|reset|range|color|file|image)$/;
 /** What works the controls that are no text fields. */

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The settings in a real browser: nothing that was typed is lost, nobody's change is lost unseen, and nothing is deleted unasked.
+// The settings in a real browser: nothing that was typed is lost, nobody's change is lost unseen, and nothing is
+// deleted unasked.
 
 import type { Page } from "playwright-core";
 import { kNothingDenied } from "../../../../client/src/ui/settings/accounts/rights";

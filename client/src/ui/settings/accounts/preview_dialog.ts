@@ -11,7 +11,10 @@ import { notify } from "../../widgets/notice";
 import { plainTable, scrolled } from "../../widgets/table";
 import { kRightNames } from "./rights";
 
-/** `isChanged`: what is shown is stored, and the form holds something else. `pressed` is busy until there is something to show. */
+/**
+ * `isChanged`: what is shown is stored, and the form holds something else. `pressed` is busy until there is something
+ * to show.
+ */
 export async function showPreview(
   host: HTMLElement,
   accounts: Accounts,

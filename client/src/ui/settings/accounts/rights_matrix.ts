@@ -2,8 +2,8 @@
 //
 // What an account may do, as ticks: groups and cameras by live, sound and playback; doors, I/O modules and maps.
 //
-// Why so        What is stored is what is denied, so that a new camera is seen by everyone who is not kept from it. A group
-//               that is denied covers its cameras: their own ticks stay as they are and are shown without effect.
+// Why so        What is stored is what is denied, so that a new camera is seen by everyone who is not kept from it. A
+//               group that is denied covers its cameras: their own ticks stay as they are and are shown without effect.
 
 import { kCameraRights, type CameraRight, type Denied, type UserList } from "../../../wire/accounts";
 import { element } from "../../widgets/dom";

@@ -89,7 +89,10 @@ export class CameraRow {
     if (footage) setText(this.#footage, footage.bytes > 0 ? `${bytesText(footage.bytes)} of footage` : "no footage");
   }
 
-  /** Shows what the camera sees now, unless it would have to be started for that; a failure leaves the picture as it was. */
+  /**
+   * Shows what the camera sees now, unless it would have to be started for that; a failure leaves the picture as it
+   * was.
+   */
   async loadPicture(signal: AbortSignal): Promise<void> {
     if (this.#camera.state !== "running") return;
     const wanted = { id: this.id, video_type: this.#camera.codec === "mjpeg" ? kVideoTypeMjpeg : 0 };

@@ -2,8 +2,8 @@
 //
 // The week as a grid of hours that is painted with pointer or keys.
 //
-// Why so        One control with a single stop for Tab: 168 of them would keep everyone who works with the keyboard from
-//               what follows. Arrows go from hour to hour, and with Shift paint on the way.
+// Why so        One control with a single stop for Tab: 168 of them would keep everyone who works with the keyboard
+//               from what follows. Arrows go from hour to hour, and with Shift paint on the way.
 
 import { element } from "../../widgets/dom";
 import { radioField, type Field } from "../../widgets/fields";

@@ -6,7 +6,9 @@ import type { HostDenial, HostLoss } from "../../../wire/hosts";
 
 const kUsualPort = 8443;
 
-/** "https://nvr:443/#settings", "nvr:443", "[2001:db8::1]:443" or a plain address; `port` where none is typed with it. */
+/**
+ * "https://nvr:443/#settings", "nvr:443", "[2001:db8::1]:443" or a plain address; `port` where none is typed with it.
+ */
 export function hostAndPort(typed: string, port: number | null): { address: string; port: number } {
   const host = typed.trim().replace(/^https?:\/\//i, "").replace(/[/?#].*$/, "");
   const [, inBrackets, plain, ownPort] = /^(?:\[(.*)\]|([^:]*))(?::(\d+))?$/.exec(host) ?? [];
