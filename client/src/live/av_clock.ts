@@ -31,8 +31,8 @@ export class AudibleClock {
 /**
  * Finds for each decoded audio chunk the timestamp that it was sent with.
  *
- * Why so        Decoders derive the timestamps of their output from the first one and the number of samples since. A camera's
- *               sample clock is never exact, so those drift away from the stream's timestamps by seconds a day.
+ * Why so        Decoders derive the timestamps of their output from the first one and the number of samples since. A
+ *               camera's sample clock is never exact, so those drift away from the stream's timestamps by seconds a day.
  */
 export class TimestampMatcher {
   #sentUs: number[] = [];

@@ -10,8 +10,10 @@
 // Invariants    (1) Only `set` turns the clock back. (2) Of a player that is not left behind, the frame on the screen
 //               is the one of the clock's time, or that before it while the next is on its way.
 
-/** How long all wait for one, in milliseconds: for the first frame of a stream, and, beyond the time between two, for each
- *  that follows. */
+/**
+ * How long all wait for one, in milliseconds: for the first frame of a stream, and, beyond the time between two, for
+ * each that follows.
+ */
 const kMaxOpeningMs = 3_000;
 const kMaxWaitMs = 1_500;
 /** Frames are at most so far apart, in a recording that has no gap. */
