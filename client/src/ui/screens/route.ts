@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall; #events, and
-// what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
+// What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall, or of it the
+// cameras of one group, #group=3; #events, and what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
 // #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
 // with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
 // one-time token.
@@ -18,6 +18,7 @@ export const kSettingsSections = [
 export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kCameraPattern = /^#camera=(\d+)$/;
+const kGroupPattern = /^#group=(\d+)$/;
 const kEventsPattern = /^#(events|(event|alert|pos)=\d+)(&|$)/;
 const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?|(&edit))?$/;
@@ -88,6 +89,16 @@ export function openScreen(): ScreenName {
 export function openCamera(): number | null {
   const found = kCameraPattern.exec(location.hash);
   return found ? Number(found[1]) : null;
+}
+
+/** The group whose cameras the wall shows; null: those of all. */
+export function openGroup(): number | null {
+  const found = kGroupPattern.exec(location.hash);
+  return found ? Number(found[1]) : null;
+}
+
+export function groupAddress(id: number): string {
+  return `#group=${id}`;
 }
 
 /** Opens a camera. Going from one camera to the next leaves one entry in the history, not one for each. */

@@ -91,6 +91,11 @@ export class Grid {
     this.#arrange();
   }
 
+  /** How many tiles there are. */
+  get size(): number {
+    return this.#tiles.size;
+  }
+
   tile(cameraId: number): Tile | undefined {
     return this.#tiles.get(cameraId);
   }

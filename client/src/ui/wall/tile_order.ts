@@ -15,8 +15,14 @@ export function inOwnOrder(cameras: readonly Camera[]): Camera[] {
   return [...cameras].sort((one, other) => place(one) - place(other));
 }
 
+/** `ids` may be some of the cameras: among those that are not shown now, they keep the places that they have. */
 export function keepOrder(ids: readonly number[]): void {
-  localStorage.setItem(kStorageKey, JSON.stringify(ids));
+  localStorage.setItem(kStorageKey, JSON.stringify(mergedOrder(storedOrder(), ids)));
+}
+
+export function mergedOrder(before: readonly number[], ids: readonly number[]): number[] {
+  const rest = [...ids];
+  return [...before.map((id) => (ids.includes(id) ? rest.shift()! : id)), ...rest];
 }
 
 function storedOrder(): number[] {

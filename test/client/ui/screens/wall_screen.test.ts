@@ -155,6 +155,32 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.locator(".sound", { hasText: "Sound off" }).waitFor();
   }, 40_000);
 
+  test("a group's tab shows its cameras alone, and no others have a connection; Back and a reload keep to it", async () => {
+    const page = await loggedIn(4);
+    await allLive(page, 4);
+    const tiles = () => page.locator(".tile").evaluateAll((all) => all.map((tile) => (tile as HTMLElement).dataset["camera"]));
+    await page.getByRole("link", { name: "Yard" }).click();
+    await open(["1/1", "2/1"]);
+    expect([await tiles(), await page.textContent(".bar-status")]).toEqual([["1", "2"], "2 cameras"]);
+    await page.focus("[data-camera='1'] .tile-open");
+    await page.keyboard.press("Shift+ArrowRight");
+    await page.click("[data-camera='1'] .tile-open");
+    await page.keyboard.press("ArrowRight");
+    await page.waitForURL(/#camera=2$/);
+    await page.keyboard.press("Escape");
+    await page.waitForURL(/#group=1$/);
+    await page.reload();
+    await allLive(page, 2);
+    expect(await tiles()).toEqual(["2", "1"]);
+    await page.getByRole("link", { name: "All" }).click();
+    await allLive(page, 4);
+    expect((await tiles()).indexOf("2")).toBeLessThan((await tiles()).indexOf("1"));
+    await page.goto(`${client.address}#group=7`);
+    await page.locator(".wall-message", { hasText: "This group has no cameras that you may watch." }).waitFor();
+    await page.getByRole("link", { name: "Show all cameras" }).click();
+    await allLive(page, 4);
+  }, 40_000);
+
   test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
     const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
     await allLive(page, 2);
