@@ -2,30 +2,23 @@
 //
 // The user's own order of the tiles, kept for the next visit, and how the pointer changes it.
 
+import type { Preferences } from "../../wire/preferences";
 import type { Camera } from "../../wire/server";
 
-const kStorageKey = "lookhaven.order";
+const kName = "wall.order";
 /** A pointer that moved less than this has clicked. */
 const kDragPx = 8;
 
 /** In the user's order; cameras that they never moved come after the others, as the server lists them. */
-export function inOwnOrder(cameras: readonly Camera[]): Camera[] {
-  const order = storedOrder();
+export function inOwnOrder(preferences: Preferences, cameras: readonly Camera[]): Camera[] {
+  const preferred = preferences.get(kName);
+  const order: unknown[] = Array.isArray(preferred) ? preferred : [];
   const place = ({ id }: Camera) => (order.includes(id) ? order.indexOf(id) : order.length);
   return [...cameras].sort((one, other) => place(one) - place(other));
 }
 
-export function keepOrder(ids: readonly number[]): void {
-  localStorage.setItem(kStorageKey, JSON.stringify(ids));
-}
-
-function storedOrder(): number[] {
-  try {
-    const stored: unknown = JSON.parse(localStorage.getItem(kStorageKey) ?? "[]");
-    return Array.isArray(stored) ? stored.filter((id): id is number => typeof id === "number") : [];
-  } catch {
-    return [];
-  }
+export function keepOrder(preferences: Preferences, ids: readonly number[]): void {
+  preferences.set(kName, ids);
 }
 
 /**
