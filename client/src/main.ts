@@ -4,9 +4,10 @@
 //
 //   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers
 //              camera_setup, groups, emap_setup, devices, hosts with their pairing_code, accounts, mounts, system,
-//              audit), what is being reported (alerts, from an event_stream), why cameras send nothing (signal_losses),
-//              the parts of an endless answer (multipart), files that are sent (upload), requests that end in time
-//              (deadline) and take turns (semaphore), cancellable waits (delay), what the page came over (protocol)
+//              audit), what the account prefers (preferences, of earlier versions browser_preferences), what is being
+//              reported (alerts, from an event_stream), why cameras send nothing (signal_losses), the parts of an
+//              endless answer (multipart), files that are sent (upload), requests that end in time (deadline) and take
+//              turns (semaphore), cancellable waits (delay), what the page came over (protocol)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept
 //              running by a feed, watched by signal_state, shared out by stream_budget. video_player (with frame_gate)
 //              and audio_player (with jitter_buffer) decode compressed streams, av_clock keeps them in sync.

@@ -33,19 +33,31 @@ Json::Value WithoutRevision(Json::Value record) {
     return record;
 }
 
+// Inside of a transaction.
+void MakeAndAudit(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
+    const Change change = make();
+    const Json::Value before = WithoutRevision(change.before);
+    const Json::Value after = WithoutRevision(change.after);
+    if (before != after) {
+        store::AuditLog(store).Add({0, base::WallSeconds(), actor.user_id, actor.name, actor.address, change.action,
+                                    change.object, AuditText(before), AuditText(after)});
+    }
+}
+
 }  // namespace
 
 void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
     store::InTransaction(store, [&] {
         store::Users(store).Lock();  // who may make this change may do so until it is made
         RequireManager(store, actor);
-        const Change change = make();
-        const Json::Value before = WithoutRevision(change.before);
-        const Json::Value after = WithoutRevision(change.after);
-        if (before != after) {
-            store::AuditLog(store).Add({0, base::WallSeconds(), actor.user_id, actor.name, actor.address, change.action,
-                                        change.object, AuditText(before), AuditText(after)});
-        }
+        MakeAndAudit(store, actor, make);
+    });
+}
+
+void ApplyToSelf(store::Store& store, const Actor& actor, const std::function<Change()>& make) {
+    store::InTransaction(store, [&] {
+        store::Users(store).Lock();
+        MakeAndAudit(store, actor, make);
     });
 }
 

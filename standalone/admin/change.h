@@ -31,6 +31,10 @@ struct Change {
 // StoreError, and what make throws.
 void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make);
 
+// The same for what accounts change of themselves alone, for which they need not be a manager's. That the actor's
+// account still exists is for make to see.
+void ApplyToSelf(store::Store& store, const Actor& actor, const std::function<Change()>& make);
+
 // "Gate (3)"
 std::string Named(const std::string& name, int id);
 
@@ -60,7 +64,7 @@ class StillNeeded : public std::runtime_error {
 // Apply.
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen);
 
-// A record as base::OneLineJson wrote it into the audit log; null for an empty text.
+// A record as base::OneLineJson wrote it, into the audit log for one; null for an empty text.
 Json::Value FromText(const std::string& text);
 
 }  // namespace lookhaven::admin

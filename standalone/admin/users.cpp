@@ -7,10 +7,8 @@
 #include "standalone/admin/invitation.h"
 #include "standalone/admin/user_record.h"
 #include "standalone/base/clock.h"
-#include "standalone/store/audit_log.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/servers.h"
-#include "standalone/store/transaction.h"
 
 namespace lookhaven::admin {
 
@@ -168,10 +166,20 @@ void RemoveUser(store::Store& store, const Actor& actor, int id, std::optional<s
     });
 }
 
+std::vector<store::Session> SessionsOf(store::Store& store, const Actor& actor, int id) {
+    if (id != actor.user_id) {
+        RequireManager(store, actor);
+    }
+    Users users(store);
+    RequireUser(users, id);
+    return store::Sessions(store).OfUser(id, base::WallSeconds());
+}
+
 int EndSessions(store::Store& store, const Actor& actor, int id, const std::optional<std::string>& handle,
                 std::string_view kept) {
     int ended = 0;
-    Apply(store, actor, [&] {
+    const auto apply = id == actor.user_id ? ApplyToSelf : Apply;
+    apply(store, actor, [&] {
         Users users(store);
         const User user = RequireUser(users, id);
         RequireMayManage(users, actor, user.privilege);
@@ -187,11 +195,12 @@ int EndSessions(store::Store& store, const Actor& actor, int id, const std::opti
 
 void ChangePassword(store::Store& store, const std::string& address, const store::VerifiedUser& user,
                     const store::HashedPassword& password, std::string_view kept_session) {
-    store::InTransaction(store, [&] {
+    ApplyToSelf(store, {user.id, user.name, address}, [&] {
         Users(store).SetPassword(user, password, kept_session);
         VoidInvitationOf(store, user.id);
-        store::AuditLog(store).Add({0, base::WallSeconds(), user.id, user.name, address, "user.changePassword",
-                                    Named(user.name, user.id), "", R"({"password":"new"})"});
+        Json::Value after;
+        after["password"] = "new";
+        return Change{"user.changePassword", Named(user.name, user.id), {}, after};
     });
 }
 

@@ -41,7 +41,11 @@ Json::Value SetUser(store::Store& store, const Actor& actor, int id, std::option
 // Throws StillNeeded for the last owner and for the actor's own account.
 void RemoveUser(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen);
 
-// Ends the session of that handle, or all of the account's; of all but the one to be kept. Returns how many.
+// The account's live sessions, the newest first. Those of another account are for managers.
+std::vector<store::Session> SessionsOf(store::Store& store, const Actor& actor, int id);
+
+// Ends the session of that handle, or all of the account's; of all but the one to be kept. Returns how many. Every
+// actor may end those of the own account.
 int EndSessions(store::Store& store, const Actor& actor, int id, const std::optional<std::string>& handle,
                 std::string_view kept);
 

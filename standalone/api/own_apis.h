@@ -46,7 +46,7 @@ extern const OwnApi kPlaybackApi;  // controls a running player of the caller's 
 extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
 extern const OwnApi kServerApi;    // the hosts that this one is paired with, for managers
 extern const OwnApi kSystemApi;    // health, metrics, checks, audit log and settings of the installation
-extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own password
+extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own account
 
 // Null when there is no such API.
 const OwnApi* FindOwnApi(const std::string& name);

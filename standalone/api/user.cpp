@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.User: accounts and what they are denied, their sessions; and everybody's own password. Whatever tells of
-// accounts takes POST, too: then no address of it ends up in a log or a browser's history.
+// VEXO.User: accounts and what they are denied, their sessions; and everybody's own password, sessions and preferences.
+// Whatever tells of accounts takes POST, too: then no address of it ends up in a log or a browser's history.
 #include <algorithm>
 #include <optional>
 #include <vector>
@@ -12,13 +12,14 @@
 #include "standalone/api/named_list.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/password_check.h"
+#include "standalone/api/preferences.h"
 #include "standalone/api/revision.h"
+#include "standalone/api/user_sessions.h"
 #include "standalone/base/clock.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/devices.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/groups.h"
-#include "standalone/store/secret.h"
 #include "standalone/store/servers.h"
 #include "standalone/store/sessions.h"
 
@@ -137,48 +138,6 @@ std::string Remove(const Call& call) {
     return SuccessAnswer(Json::objectValue);
 }
 
-// What names a session here. Not its handle, by which other processes of this machine know it.
-std::string KeyOf(const store::Session& session) {
-    constexpr std::size_t kKeyDigits = 32;
-    return store::Digest("session " + session.handle).substr(0, kKeyDigits);
-}
-
-// The handle of the account's session of that key; one that no session has where there is none.
-std::string HandleOf(const Call& call, const std::string& key) {
-    for (const store::Session& session : store::Sessions(call.Records()).OfUser(IdOf(call), base::WallSeconds())) {
-        if (KeyOf(session) == key) {
-            return session.handle;
-        }
-    }
-    return "";
-}
-
-std::string Sessions(const Call& call) {
-    if (!store::Users(call.Records()).Find(IdOf(call))) {
-        throw Failure(404, "there is no such account");
-    }
-    Json::Value data;
-    data["session"] = Json::arrayValue;
-    for (const store::Session& session : store::Sessions(call.Records()).OfUser(IdOf(call), base::WallSeconds())) {
-        Json::Value& json = data["session"].append(Json::objectValue);
-        json["key"] = KeyOf(session);
-        json["address"] = session.address;
-        json["started"] = Json::Int64{session.created_s};
-        json["lastUse"] = Json::Int64{session.last_seen_s};
-        json["current"] = session.handle == call.login.value().session_handle;
-    }
-    return SuccessAnswer(data);
-}
-
-std::string EndSessions(const Call& call) {
-    const Json::Value& key = call.Parameter("key");
-    Json::Value data;
-    data["ended"] = admin::EndSessions(call.Records(), call.Actor(), IdOf(call),
-                                       key.isNull() ? std::nullopt : std::optional(HandleOf(call, key.asString())),
-                                       call.login.value().session_handle);
-    return SuccessAnswer(data);
-}
-
 std::string Preview(const Call& call) {
     Json::Value data;
     data["camera"] = NamedList(admin::CamerasAsSeenBy(call.Records(), IdOf(call)),
@@ -206,11 +165,11 @@ std::string ChangePassword(const Call& call) {
 using enum Method::Effect;
 using enum Method::Audience;
 
-constexpr Method kMethods[] = {
-    {"List", List, kChanges, kManagers},         {"Add", Add, kChanges, kManagers},
-    {"Set", Set, kChanges, kManagers},           {"Remove", Remove, kChanges, kManagers},
-    {"Sessions", Sessions, kChanges, kManagers}, {"EndSessions", EndSessions, kChanges, kManagers},
-    {"Preview", Preview, kChanges, kManagers},   {"ChangePassword", ChangePassword, kChanges}};
+constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},       {"Add", Add, kChanges, kManagers},
+                               {"Set", Set, kChanges, kManagers},         {"Remove", Remove, kChanges, kManagers},
+                               {"Preview", Preview, kChanges, kManagers}, {"ChangePassword", ChangePassword, kChanges},
+                               {"Sessions", Sessions, kChanges},          {"EndSessions", EndSessions, kChanges},
+                               {"Preferences", Preferences, kChanges},    {"SetPreferences", SetPreferences, kChanges}};
 
 }  // namespace
 

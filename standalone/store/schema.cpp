@@ -232,6 +232,12 @@ end $do$)",
     "create index marks_by_time on marks (start_s, id)",
 };
 
+// One JSON object each.
+constexpr const char* kPreferences[] = {
+    ("create table preferences (user_id integer not null primary key references users (id) on delete cascade,"
+     " value text not null)"),
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -249,6 +255,7 @@ constexpr Migration kMigrations[] = {
     {"where a log-in came from", kSessionAddresses},
     {"why events are kept", kKeptEvents},
     {"the words in texts of marks", {}, kMarkWordsOnSqlite, kMarkWordsOnPostgresql},
+    {"what accounts prefer", kPreferences},
 };
 
 }  // namespace

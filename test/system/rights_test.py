@@ -102,6 +102,11 @@ POST User.Set id={user} revision=1 mayMark=true                       E      E  
 POST User.Remove id={user} revision=1 reauth=own                      E      E     F       F     F    F       F        F      C/N     E
 POST User.Sessions id={user}                                          E      E     F       F     F    F       F        F      D/N     E
 POST User.EndSessions id={user}                                       E      E     F       F     F    F       F        F      D/N     E
+POST User.Sessions                                                    E      E     D       D     D    D       D        D      D       E
+POST User.EndSessions                                                 E      E     D       D     D    D       D        D      D       E
+POST User.Preferences                                                 E      E     D       D     D    D       D        D      D       E
+POST User.SetPreferences preferences={{"layout":"2"}}                 E      E     D       D     D    D       D        D      D       E
+POST User.SetPreferences id={user} preferences={{}}                   E      E     F       F     F    F       F        F      F       E
 POST User.Preview id={user}                                           E      E     F       F     F    F       F        F      D/N     E
 POST User.ChangePassword password=own newPassword=own                 E      E     D       D     D    D       D        D      D       E
 Player.LoadCamera: camera                                             E      E     D       O     D    D       D        D      D       E

@@ -33,6 +33,10 @@ await visit(async (page, complaints) => {
   await page.keyboard.press("?");
   await look("keys", "dialog[open] kbd", ["desk"]);
   await page.keyboard.press("Escape");
+  await page.click("button.account");
+  await page.getByRole("button", { name: "Your sessions" }).click();
+  await look("sessions", "dialog[open] .plain-table", ["phone"]);
+  await page.keyboard.press("Escape");
   await page.keyboard.press("Tab");
   await go("#camera=1");
   await look("large", '.large[data-state="live"]');

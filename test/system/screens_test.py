@@ -18,6 +18,7 @@ class ScreensTest(unittest.TestCase):
                 ("log-in", "Log in", None),
                 ("wall", "Live", "Live"),
                 ("keys", "Live", None),
+                ("sessions", "Live", None),
                 ("large", "Entrance", "Entrance"),
                 ("snapshot", "Entrance", None),
                 ("events", "Events", "Events"),

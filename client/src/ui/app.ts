@@ -5,6 +5,8 @@
 
 import { watchAlerts } from "../live/alert_watch";
 import { streamLimit } from "../live/stream_budget";
+import type { EventKind } from "../playback/coverage";
+import { Preferences } from "../wire/preferences";
 import { protocol } from "../wire/protocol";
 import { Server, type Account } from "../wire/server";
 import { isKindChosen } from "./events/event_filter";
@@ -33,6 +35,8 @@ export class App {
   readonly #root: HTMLElement;
   readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
   #account: Account | null = null;
+  /** Null where there is no account. */
+  #preferences: Preferences | null = null;
   /** Of the account that was the last to log in. */
   #remembered = rememberedFor(0);
   /** Null at the log-in. */
@@ -55,7 +59,7 @@ export class App {
     const forever = new AbortController().signal;
     const status = await keepTrying(() => this.#server.status(), (sentence) => this.#showWaiting(sentence), forever);
     this.#isWithoutAccounts = status === "no-account";
-    if (typeof status === "object") this.#showScreens(status);
+    if (typeof status === "object") await this.#showScreens(status);
     else if (this.#isWithoutAccounts) this.#showSetup();
     else this.#showLogin(setupToken() === null ? "" : "There is an account already. Please log in.");
   }
@@ -71,7 +75,8 @@ export class App {
     // A screen closes many requests, each of which may report once more that the session has ended.
     if (this.#screen === null && this.#root.querySelector(".login-form")) return;
     this.#screen?.close();
-    this.#screen = this.#account = null;
+    this.#preferences?.close();
+    this.#screen = this.#account = this.#preferences = null;
     this.#watching?.abort();
     hideNotice();
     if (setupToken() !== null) leaveSetup(location.pathname + location.search);
@@ -87,7 +92,7 @@ export class App {
     const made = (account: Account) => {
       this.#remembered = rememberedFor(account.user_id, true);
       leaveSetup(settingsAddress("cameras", "new"));
-      this.#showScreens(account);
+      return this.#showScreens(account);
     };
     const hasAccount = (sentence: string) => {
       this.#isWithoutAccounts = false;
@@ -100,9 +105,12 @@ export class App {
     this.#root.querySelector("input")?.focus();
   }
 
-  #showScreens(account: Account): void {
+  async #showScreens(account: Account): Promise<void> {
     this.#isWithoutAccounts = false;
+    const preferences = await Preferences.load(this.#server, account.user_id);
     this.#account = account;
+    this.#preferences?.close();
+    this.#preferences = preferences;
     if (this.#remembered.userId !== account.user_id) {
       this.#remembered = rememberedFor(account.user_id);
       this.#server.alerts.forget();
@@ -110,7 +118,8 @@ export class App {
     this.#watching?.abort();
     this.#watching = new AbortController();
     const { signal } = this.#watching;
-    void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, isKindChosen, signal);
+    const admits = (kind: EventKind) => isKindChosen(preferences, kind);
+    void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, admits, signal);
     const nameOf = async (id: number) => (await this.#server.cameras()).camera?.find((one) => one.id === id)?.name ?? "";
     new AlertNotifications(account.user_id).follow(this.#server.alerts, nameOf, signal);
     this.#followRoute();
@@ -120,7 +129,7 @@ export class App {
   #followRoute(): boolean {
     const name = openScreen();
     if (this.#isWithoutAccounts) this.#showSetup();
-    if (!this.#account) return true;
+    if (!this.#account || !this.#preferences) return true;
     if (this.#screen?.name === name) return this.#screen.followRoute();
     if (this.#screen && !this.#screen.canLeave()) return false;
     this.#screen?.close();
@@ -128,6 +137,7 @@ export class App {
       server: this.#server,
       account: this.#account,
       remembered: this.#remembered,
+      preferences: this.#preferences,
       onLogOut: () => this.#showLogin(""),
     };
     this.#screen = new kScreens[name](session);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Accounts, their rights and sessions. All but the change of one's own password is for managers only.
+// Accounts, their rights and sessions. All but one's own password and sessions is for managers only.
 
 import type { Named, RecordKey } from "./camera_setup";
 import type { Server } from "./server";
@@ -93,13 +93,14 @@ export class Accounts {
     return this.#call("Remove", { id, revision, reauth });
   }
 
-  async sessions(id: number): Promise<OpenSession[]> {
+  /** Of the caller's own account where none is named. */
+  async sessions(id?: number): Promise<OpenSession[]> {
     return (await this.#call<{ session: OpenSession[] }>("Sessions", { id })).session;
   }
 
-  /** Without a key, all but the caller's own. Returns how many ended. */
-  async endSessions(id: number, key?: string): Promise<number> {
-    return (await this.#call<{ ended: number }>("EndSessions", key === undefined ? { id } : { id, key })).ended;
+  /** Of that account, or of the caller's own. Without a key, all but the one that asks. Returns how many ended. */
+  async endSessions(id?: number, key?: string): Promise<number> {
+    return (await this.#call<{ ended: number }>("EndSessions", { id, key })).ended;
   }
 
   /** What this account sees. */

@@ -68,6 +68,15 @@ export class ServerError extends Error {
   }
 }
 
+interface CallOptions {
+  form?: Record<string, string>;
+  json?: unknown;
+  quiet?: boolean;
+  signal?: AbortSignal;
+  timeoutMs?: number;
+  keepalive?: boolean;
+}
+
 interface Failure {
   error?: { code?: number; message?: string; data?: unknown };
 }
@@ -205,18 +214,19 @@ export class Server {
 
   /**
    * The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported.
-   * `signal` ends the request.
+   * `signal` ends the request. With `keepalive` it goes on when the page is left.
    */
   async call<Data>(
     api: string,
     method: string,
     parameters: Record<string, string>,
-    how: { form?: Record<string, string>; json?: unknown; quiet?: boolean; signal?: AbortSignal; timeoutMs?: number } = {},
+    how: CallOptions = {},
   ): Promise<Data> {
     const deadline = new Deadline(how.timeoutMs ?? kAnswerTimeoutMs, how.signal);
     try {
       const answer = await fetch(address(api, method, parameters), {
         signal: deadline.signal,
+        keepalive: how.keepalive ?? false,
         ...(how.form ? { method: "POST", body: new URLSearchParams(how.form) } : {}),
         ...(how.json
           ? { method: "POST", body: JSON.stringify(how.json), headers: { "Content-Type": "application/json" } }

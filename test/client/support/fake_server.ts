@@ -92,7 +92,7 @@ export class FakeServer {
   }
 
   get #account() {
-    return { account: "admin", user_id: 1, is_manager: this.isManager, players_per_session: this.archive.playersPerSession };
+    return { account: "admin", user_id: this.setup.userId, is_manager: this.isManager, players_per_session: this.archive.playersPerSession };
   }
 
   async #makeFirstAccount(request: IncomingMessage, answer: ServerResponse): Promise<void> {

@@ -8,7 +8,7 @@ import type { EmapRecord } from "../../../client/src/wire/emap_setup";
 import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { HostLoss, HostRecord } from "../../../client/src/wire/hosts";
 import type { MountRecord } from "../../../client/src/wire/mounts";
-import type { UserRecord } from "../../../client/src/wire/accounts";
+import type { OpenSession, UserRecord } from "../../../client/src/wire/accounts";
 import type { LogLevels, OfferedCertificate, SettingRecord, SystemStatus } from "../../../client/src/wire/system";
 
 type Request = Record<string, never> & { id: number };
@@ -28,6 +28,11 @@ export const kCode = "008J-4CT4-ANK7-F24S-04HM-ASW9-NF6Y-Z93N";
 export class FakeSetup {
   readonly camera: CameraRecord[] = [];
   readonly user: UserRecord[] = [];
+  /** The account that is logged in, and its sessions. */
+  userId = 1;
+  readonly session: OpenSession[] = [];
+  /** Of each account. */
+  readonly preferences = new Map<number, Record<string, unknown>>();
   readonly mount: MountRecord[] = [];
   readonly group: GroupRecord[] = [];
   readonly emap: EmapRecord[] = [];
@@ -57,7 +62,10 @@ export class FakeSetup {
     "VEXO.Camera.Order": (request) => this.#note("Camera.Order", request, ok({})),
     "VEXO.User.List": () => ok({ user: this.user, camera: this.camera, group: [{ id: 1, name: "Outside", camera: [2] }], door: [], ioModule: [], emap: [] }),
     "VEXO.User.Set": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : this.#set("user", request)),
-    "VEXO.User.Sessions": () => ok({ session: [] }),
+    "VEXO.User.Sessions": () => ok({ session: this.session }),
+    "VEXO.User.EndSessions": (request) => this.#endSessions(request),
+    "VEXO.User.Preferences": () => ok({ preferences: this.preferences.get(this.userId) ?? {} }),
+    "VEXO.User.SetPreferences": (request) => this.#setPreferences(request),
     "VEXO.Mount.List": () => ok({ mount: this.mount }),
     "VEXO.Mount.Set": (request) => (request.confirm ? this.#set("mount", request) : ok({ confirm: this.loss })),
     "VEXO.Group.List": () => ok({ group: this.group }),
@@ -88,6 +96,22 @@ export class FakeSetup {
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
     Object.assign(record, changes, { revision: record.revision + 1 });
     return this.#note(kind, request, ok({ [kind]: record }));
+  }
+
+  #endSessions(request: Request): Answer {
+    const { key } = request as unknown as { key?: string };
+    const stay = this.session.filter((one) => (key === undefined ? one.current : one.key !== key));
+    const ended = this.session.length - stay.length;
+    this.session.splice(0, Infinity, ...stay);
+    return this.#note("EndSessions", request, ok({ ended }));
+  }
+
+  #setPreferences(request: Request): Answer {
+    const { id, preferences } = request as unknown as { id: number; preferences: Record<string, unknown> };
+    if (id !== this.userId) return failed(403, "these are another account's preferences");
+    const merged = { ...this.preferences.get(id), ...preferences };
+    this.preferences.set(id, merged);
+    return ok({ preferences: merged });
   }
 
   #addHost(request: Request): Answer {

@@ -14,7 +14,7 @@ export const hasBrowser = existsSync(executablePath);
 
 /**
  * Make one in a describe block: it starts before the tests there and ends after them. After each, its pages are closed,
- * no stream may be left, and nothing may have been complained of.
+ * nobody prefers anything, no stream may be left, and nothing may have been complained of.
  */
 export class ServedClient {
   readonly server = new FakeServer();
@@ -32,6 +32,7 @@ export class ServedClient {
     }, 60_000);
     afterEach(async () => {
       for (const context of this.#browser.contexts()) await context.close();
+      this.server.setup.preferences.clear();
       await vi.waitFor(() => expect([...this.server.streams, ...this.server.archive.streams]).toEqual([]), 5000);
       expect(this.#complaints.splice(0), "of scripts and of the content security policy").toEqual([]);
     });

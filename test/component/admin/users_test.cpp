@@ -8,6 +8,7 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/admin/user_record.h"
+#include "standalone/base/clock.h"
 #include "standalone/store/audit_log.h"
 #include "test/component/store/store_fixture.h"
 
@@ -78,6 +79,9 @@ TEST_P(UserTest, NobodyGetsMoreThanHeMayGiveAndAnOwnerStays) {
          [this] { SetUser(store_, manager_, owner_.user_id, {}, {.password = password_}); }, "refused"},
         {"a manager ends an owner's sessions", [this] { EndSessions(store_, manager_, owner_.user_id, {}, ""); },
          "refused"},
+        {"a viewer ends a manager's sessions", [this] { EndSessions(store_, viewer_, manager_.user_id, {}, ""); },
+         "refused"},
+        {"a viewer ends those of nobody", [this] { EndSessions(store_, viewer_, 99, {}, ""); }, "refused"},
         {"the last owner demotes himself", set(owner_, owner_, Privilege::kManager), "needed"},
         {"the last owner is removed", remove(console, owner_), "needed"},
         {"a manager removes himself", remove(manager_, manager_), "needed"},
@@ -189,6 +193,37 @@ TEST_P(UserTest, DenialsAreReplacedAsAWholeOrNotAtAll) {
                               R"({"group": []})", R"({"group": {"door": [1]}})", R"({"emap": [1.5]})"}) {
         EXPECT_THROW(DenialsFrom(parse(wrong)), store::InvalidRecord) << wrong;
     }
+}
+
+TEST_P(UserTest, SessionsAreOfOnesOwnOrForManagers) {
+    const Actor console;
+    store::Sessions sessions(store_);
+    const auto log_in = [&](const Actor& who) { return sessions.Create(who.user_id, base::WallSeconds()).handle; };
+    for (const Actor* who : {&owner_, &manager_, &viewer_, &viewer_, &viewer_}) {
+        log_in(*who);
+    }
+    const std::string kept = log_in(viewer_);
+    const struct {
+        Actor who;
+        Actor whose;
+        const char* seen;
+    } rows[] = {
+        {viewer_, viewer_, "4"},          {viewer_, manager_, "refused"}, {viewer_, Actor{99}, "refused"},
+        {manager_, viewer_, "4"},         {manager_, owner_, "1"},        {manager_, Actor{99}, "absent"},
+        {Actor{99}, Actor{99}, "absent"}, {console, viewer_, "4"},
+    };
+    for (const auto& row : rows) {
+        std::size_t count = 0;
+        const std::string outcome = Outcome([&] { count = SessionsOf(store_, row.who, row.whose.user_id).size(); });
+        EXPECT_EQ(outcome == "done" ? std::to_string(count) : outcome, row.seen)
+            << row.who.name << " of " << row.whose.user_id;
+    }
+    EXPECT_EQ(EndSessions(store_, viewer_, viewer_.user_id, sessions.OfUser(owner_.user_id, 0).front().handle, kept),
+              0);
+    EXPECT_THAT(Audited(), IsEmpty()) << "nothing has ended";
+    EXPECT_EQ(EndSessions(store_, viewer_, viewer_.user_id, {}, kept), 3);
+    EXPECT_THAT(Audited(), ElementsAre(R"(user.endSessions viewer (3)  {"ended":3})"));
+    EXPECT_THAT(SessionsOf(store_, viewer_, viewer_.user_id), testing::SizeIs(1));
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(UserTest);

@@ -182,10 +182,7 @@ TEST_F(DoctorTest, EachFaultIsFoundAndItsRemedyMendsItAndLosesNothing) {
         // As before the last step in store/schema.cpp.
         {"older store",
          [&] {
-             for (const char* trigger : {"added", "removed"}) {
-                 Sql(std::string("drop trigger mark_words_") + trigger)();
-             }
-             Sql("drop table mark_words")();
+             Sql("drop table preferences")();
              Sql("update schema_version set version = version - 1")();
          },
          "do: lookhaven init"},

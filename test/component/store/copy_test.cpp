@@ -8,6 +8,7 @@
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/preferences.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
@@ -26,6 +27,7 @@ class CopyTest : public StoreTest {
         Cameras(store_).SetCredentials(AddCamera(), Credentials{"admin", "x'; drop table users; --"});
         const int user = Users(store_).Add("bob", "correct horse", Privilege::kViewer).id;
         Users(store_).Deny(user, 2, {CameraAccess::kAudio});
+        Preferences(store_).Change(user, [](const std::string&) { return R"({"layout":"2"})"; });
         Settings(store_).Set("place", "Zürich :name $1 \\");
         Emaps(store_).Add({.name = "Ground floor"});
         std::vector<Event> events;
@@ -57,6 +59,7 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Cameras(copy).FindCredentials(2)->password, "x'; drop table users; --");
         EXPECT_TRUE(Users(copy).CheckPassword("BOB", "correct horse"));
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kAudio), ElementsAre(2));
+        EXPECT_EQ(Preferences(copy).Find(1), R"({"layout":"2"})");
         EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));
         EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));

@@ -4,6 +4,7 @@
 
 import { kEventKinds, kindOf, type EventKind } from "../../playback/coverage";
 import type { Footage } from "../../wire/footage";
+import type { Preferences } from "../../wire/preferences";
 import type { Group } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
@@ -13,9 +14,10 @@ import { kKindNames } from "./event_list";
 /** As many as the timeline shows without scrolling; the user may choose more. */
 const kDefaultCameras = 8;
 const kMaxCameras = 32;
-const kStorageKey = "lookhaven.events";
+/** Preferences each of its own, so that what a link asks for is not stored with what the user changes of it. */
+const kNames = { cameras: "events.cameras", kinds: "events.kinds", isKeptOnly: "events.keptOnly" } as const;
 
-/** What is listed, as it is kept for the next visit. */
+/** What is listed. */
 export interface FilterChoice {
   cameras: readonly number[];
   kinds: readonly EventKind[];
@@ -29,6 +31,7 @@ export interface ListChoice extends FilterChoice {
 
 export class EventFilter {
   readonly root: HTMLElement;
+  readonly #preferences: Preferences;
   readonly #changed: () => void;
   readonly #groupRow = element("div", { class: "groups", role: "group", "aria-label": "Camera groups" });
   readonly #cameraRow = element("div", { class: "cameras" });
@@ -40,25 +43,26 @@ export class EventFilter {
   readonly #boxes = new Map<EventKind | "kept", HTMLInputElement>();
 
   /** `search` is a part of it that has a place of its own. */
-  constructor(changed: () => void, search: HTMLElement) {
+  constructor(preferences: Preferences, changed: () => void, search: HTMLElement) {
+    this.#preferences = preferences;
     this.#changed = changed;
-    const stored = readStored();
-    if (stored.kinds) this.#kinds = new Set(kEventKinds.filter((kind) => stored.kinds?.includes(kind)));
-    if (stored.cameras) this.#chosen = new Set(stored.cameras);
-    this.#isKeptOnly = stored.isKeptOnly ?? false;
+    const cameras = preferences.get(kNames.cameras);
+    this.#kinds = new Set(kEventKinds.filter((kind) => isKindChosen(preferences, kind)));
+    if (Array.isArray(cameras)) this.#chosen = new Set(cameras.filter((id) => typeof id === "number"));
+    this.#isKeptOnly = preferences.get(kNames.isKeptOnly) === true;
     const kinds = kEventKinds.map((kind) => {
       const box = element("input", { type: "checkbox", checked: this.#kinds.has(kind) });
       box.addEventListener("change", () => {
         if (box.checked) this.#kinds.add(kind);
         else this.#kinds.delete(kind);
-        this.#save();
+        this.#save("kinds");
       });
       this.#boxes.set(kind, box);
       return element("label", { class: "chip" }, box, element("span", { class: "row-swatch", "data-kind": kind }), kKindNames[kind]);
     });
-    const cameras = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
+    const picker = element("details", { class: "camera-picker" }, this.#summary, this.#groupRow, this.#cameraRow);
     const kindRow = element("div", { class: "chips", role: "group", "aria-label": "Kinds of events" }, ...kinds, this.#keptChip());
-    this.root = element("section", { class: "filter", "aria-label": "Filter" }, cameras, kindRow, search);
+    this.root = element("section", { class: "filter", "aria-label": "Filter" }, picker, kindRow, search);
   }
 
   get cameras(): Camera[] {
@@ -119,14 +123,14 @@ export class EventFilter {
   #choose(cameras: readonly number[]): void {
     this.#chosen = new Set(cameras.slice(0, kMaxCameras));
     this.#showCameras();
-    this.#save();
+    this.#save("cameras");
   }
 
   #keptChip(): HTMLElement {
     const box = element("input", { type: "checkbox", checked: this.#isKeptOnly });
     box.addEventListener("change", () => {
       this.#isKeptOnly = box.checked;
-      this.#save();
+      this.#save("isKeptOnly");
     });
     this.#boxes.set("kept", box);
     return element("label", { class: "chip", title: "Only recordings that are kept" }, box, icon("kept"), "Kept");
@@ -141,28 +145,21 @@ export class EventFilter {
           if (box.checked) this.#chosen.add(id);
           else this.#chosen.delete(id);
           this.#summary.textContent = `Cameras · ${this.cameras.length} of ${this.#cameras.length}`;
-          this.#save();
+          this.#save("cameras");
         });
         return element("label", { class: "camera-choice" }, box, element("span", {}, name));
       }),
     );
   }
 
-  #save(): void {
-    localStorage.setItem(kStorageKey, JSON.stringify(this.choice));
+  #save(what: keyof FilterChoice): void {
+    this.#preferences.set(kNames[what], this.choice[what]);
     this.#changed();
   }
 }
 
 /** Whether the user has chosen to see this kind, as far as is kept. */
-export function isKindChosen(kind: EventKind): boolean {
-  return readStored().kinds?.includes(kind) ?? true;
-}
-
-function readStored(): Partial<FilterChoice> {
-  try {
-    return (JSON.parse(localStorage.getItem(kStorageKey) ?? "{}") as Partial<FilterChoice> | null) ?? {};
-  } catch {
-    return {};
-  }
+export function isKindChosen(preferences: Preferences, kind: EventKind): boolean {
+  const kinds = preferences.get(kNames.kinds);
+  return !Array.isArray(kinds) || kinds.includes(kind);
 }

@@ -6,6 +6,7 @@
 import { FootageCache } from "../../playback/footage_cache";
 import { RecordedDays } from "../../playback/recorded_days";
 import type { Footage } from "../../wire/footage";
+import type { Preferences } from "../../wire/preferences";
 import type { Recordings } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 import { spanText } from "../timeline/time_scale";
@@ -38,13 +39,13 @@ export class Overview {
   #onStage: readonly number[] = [];
   #settling: ReturnType<typeof setTimeout> | undefined;
 
-  constructor(recordings: Recordings, actions: OverviewActions) {
+  constructor(recordings: Recordings, preferences: Preferences, actions: OverviewActions) {
     this.#actions = actions;
     this.cache = new FootageCache(recordings, () => this.#showFootage());
     this.#days = new RecordedDays(recordings, () => this.#showDays());
     const scope = () => ({ cameras: this.#chosen, kinds: this.filter.kinds });
     this.#search = new TextSearch(recordings, scope, () => this.#showFootage());
-    this.filter = new EventFilter(() => actions.filtered(), this.#search.root);
+    this.filter = new EventFilter(preferences, () => actions.filtered(), this.#search.root);
     this.list = new EventList(
       (camera) => this.nameOf(camera),
       (footage, widthPx) => recordings.stillAddress(footage, footage.moment * 1000, widthPx),

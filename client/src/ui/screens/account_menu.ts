@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What users do with their own account: change its password, log out. Opened from the bar of each screen.
+// What users do with their own account: change its password, see and end its sessions, log out. Opened from the bar of
+// each screen.
 
 import { Accounts } from "../../wire/accounts";
 import { ServerError } from "../../wire/server";
+import { SessionsPanel } from "../settings/accounts/sessions_panel";
 import { iconButton } from "../widgets/button";
 import { passwordProblem } from "../widgets/credentials";
 import { element } from "../widgets/dom";
@@ -38,6 +40,7 @@ export class AccountMenu {
       { class: "account-menu", "aria-label": `Account ${name}` },
       element("p", { class: "account-name" }, name),
       this.#item("edit", "Change password", "change-password", () => void this.#changePassword()),
+      this.#item("hosts", "Your sessions", "own-sessions", () => void this.#showSessions()),
       ...(AlertNotifications.arePossible ? [this.#notifications()] : []),
       this.#item("logout", "Log out", "log-out", () => this.#logOut()),
     );
@@ -66,13 +69,22 @@ export class AccountMenu {
 
   #logOut(): void {
     if (!this.#canLeave()) return;
-    const { server, onLogOut } = this.#session;
+    const { server, preferences, onLogOut } = this.#session;
     this.#showBusy(true);
-    server.logout().then(onLogOut, (error: unknown) => {
+    const logOut = preferences.flush().then(() => server.logout());
+    logOut.then(onLogOut, (error: unknown) => {
       this.#showBusy(false);
       if (error instanceof ServerError && error.status === 401) return;
       notify(`You are still logged in: ${error instanceof ServerError ? error.message : String(error)}`);
     });
+  }
+
+  #showSessions(): Promise<boolean> {
+    const host = this.root.parentElement!;
+    const hint = "Where you are logged in now. If you do not know one of them, end it and change your password.";
+    const sessions = new SessionsPanel(new Accounts(this.#session.server), undefined, host).root;
+    const content = [element("p", { class: "form-hint" }, hint), sessions];
+    return openDialog(host, { title: "Your sessions", content, submit: "", attempt: async () => undefined });
   }
 
   async #changePassword(): Promise<void> {

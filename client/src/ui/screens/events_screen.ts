@@ -46,7 +46,7 @@ export class EventsScreen extends Screen {
   readonly #recordings = new Recordings(this.server);
   readonly #exports = new Exports(this.server);
   readonly #showing = new OncePerFrame(() => this.#showPlayback());
-  readonly #overview = new Overview(this.#recordings, {
+  readonly #overview = new Overview(this.#recordings, this.preferences, {
     seek: (atMs, camera) => this.#seek(atMs, camera),
     open: (footage) => this.#jumps.open(footage),
     sameMoment: (footage) => void this.#jumps.sameMoment(footage),

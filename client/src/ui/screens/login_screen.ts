@@ -6,8 +6,8 @@ import { ServerError, type Account, type Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 
-/** `hint` says why the user is here again, if there is a reason. */
-export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => void): HTMLElement {
+/** `hint` says why the user is here again, if there is a reason. The screen is busy until `onLogin` resolves. */
+export function loginScreen(server: Server, hint: string, onLogin: (account: Account) => Promise<void>): HTMLElement {
   const account = credentialField("account", "Account", {
     type: "text",
     autocomplete: "username",

@@ -4,6 +4,7 @@
 // progress line, its keys and the dialog that shows them, its part of the address, and a say in whether the user may
 // leave.
 
+import type { Preferences } from "../../wire/preferences";
 import type { Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
@@ -24,6 +25,7 @@ export abstract class Screen {
   readonly name: ScreenName;
   readonly root: HTMLElement;
   protected readonly server: Server;
+  protected readonly preferences: Preferences;
   /** Bar, progress line and content; a screen may hide it behind something that covers the window. */
   protected readonly front: HTMLElement;
   protected readonly progress = element("div", { class: "progress", role: "progressbar", "aria-label": "Loading" });
@@ -35,6 +37,7 @@ export abstract class Screen {
   constructor(name: ScreenName, session: Session) {
     this.name = name;
     this.server = session.server;
+    this.preferences = session.preferences;
     titleScreen(kNames[name]);
     setText(this.#heading, kNames[name]);
     const brand = element("div", { class: "brand" }, icon("lighthouse"), element("span", {}, "Lookhaven"), this.#heading);

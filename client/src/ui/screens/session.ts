@@ -3,6 +3,7 @@
 // The session of a logged-in user, which the app hands from screen to screen.
 
 import type { EditedMap } from "../../wire/emaps";
+import type { Preferences } from "../../wire/preferences";
 import type { Account, Server } from "../../wire/server";
 import type { Draft } from "../settings/draft";
 import type { AbsentCameras } from "../wall/absent_cameras";
@@ -24,6 +25,8 @@ export interface Session {
   readonly server: Server;
   readonly account: Account;
   readonly remembered: RememberedState;
+  /** What follows the account to every browser. */
+  readonly preferences: Preferences;
   /** Called when the user has logged out. */
   readonly onLogOut: () => void;
 }

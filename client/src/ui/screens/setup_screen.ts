@@ -10,7 +10,7 @@ import { brand, credentialField } from "./login_screen";
 
 /** What the screen does next. */
 export interface SetupOutcome {
-  made: (account: Account) => void;
+  made: (account: Account) => Promise<void>;
   /** There is an account already, as the sentence says. */
   hasAccount: (sentence: string) => void;
 }
@@ -46,7 +46,7 @@ export function setupScreen(server: Server, token: () => string | null, outcome:
   };
   const make = async () => {
     try {
-      outcome.made(await server.makeFirstAccount(name.input.value, password.input.value, token() ?? ""));
+      await outcome.made(await server.makeFirstAccount(name.input.value, password.input.value, token() ?? ""));
     } catch (error) {
       const failure = asServerError(error);
       if (failure.status === 409) return outcome.hasAccount(failure.message);

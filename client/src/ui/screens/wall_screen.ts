@@ -49,7 +49,7 @@ export class WallScreen extends Screen {
     this.#absent = session.remembered.absentCameras;
     const actions = { back: showWall, step: (by: 1 | -1) => this.#step(by) };
     this.#overlay = new CameraOverlay(this.server, this.root, this.front, actions);
-    this.#grid = new Grid(this.server, {
+    this.#grid = new Grid(this.server, this.preferences, {
       open: (camera) => showCamera(camera.id),
       snapshot: (camera) => this.#overlay.takeSnapshot(camera),
       dismiss: ({ id }) => {
@@ -57,7 +57,8 @@ export class WallScreen extends Screen {
         this.#showTiles();
       },
     });
-    this.addToBar(this.#status, layoutPicker((choice) => this.#grid.setLayout(choice)), fullScreenButton());
+    const layouts = layoutPicker(this.preferences, (choice) => this.#grid.setLayout(choice));
+    this.addToBar(this.#status, layouts, fullScreenButton());
     this.front.append(this.#tabs.root, this.#advice, this.#message, this.#grid.root);
     const loadUnlessHidden = () => void (document.hidden || this.#load());
     document.addEventListener("visibilitychange", loadUnlessHidden, { signal: this.closed });

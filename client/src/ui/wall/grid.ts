@@ -7,6 +7,7 @@
 //               (2) Never more tiles stream than the connection to the server carries.
 
 import { chooseStreams, streamLimit } from "../../live/stream_budget";
+import type { Preferences } from "../../wire/preferences";
 import { protocol } from "../../wire/protocol";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
@@ -34,6 +35,7 @@ const kSteps: Record<string, (columns: number) => number> = {
 export class Grid {
   readonly root = element("div", { class: "grid" });
   readonly #server: Server;
+  readonly #preferences: Preferences;
   readonly #actions: TileActions;
   readonly #semaphore = new Semaphore(1);
   readonly #maxStreams: number;
@@ -51,8 +53,9 @@ export class Grid {
   /** The ids of tiles that cannot play a stream, as text to compare. */
   #unplayable = "";
 
-  constructor(server: Server, actions: TileActions) {
+  constructor(server: Server, preferences: Preferences, actions: TileActions) {
     this.#server = server;
+    this.#preferences = preferences;
     this.#actions = actions;
     this.#maxStreams = streamLimit(protocol());
     this.#observer = new IntersectionObserver((entries) => this.#onIntersection(entries), {
@@ -67,7 +70,7 @@ export class Grid {
 
   /** Shows these cameras, then those that are absent; tiles of cameras that stay play on without interruption. */
   setCameras(cameras: readonly Camera[], absent: readonly AbsentCamera[]): void {
-    const all = [...inOwnOrder(cameras).map((camera) => ({ camera, reason: "" })), ...absent];
+    const all = [...inOwnOrder(this.#preferences, cameras).map((camera) => ({ camera, reason: "" })), ...absent];
     const isUnchanged = (tile: Tile) => {
       return all.some(({ camera, reason }) => same(camera, tile.camera) && reason === tile.picture.absence);
     };
@@ -197,7 +200,7 @@ export class Grid {
   }
 
   #onMoved(): void {
-    keepOrder(this.#inOrder().map(({ camera }) => camera.id));
+    keepOrder(this.#preferences, this.#inOrder().map(({ camera }) => camera.id));
     this.#assignSoon();
   }
 }

@@ -2,36 +2,30 @@
 //
 // The user's own order of the tiles, kept for the next visit, and how the pointer changes it.
 
+import type { Preferences } from "../../wire/preferences";
 import type { Camera } from "../../wire/server";
 
-const kStorageKey = "lookhaven.order";
+const kName = "wall.order";
 /** A pointer that moved less than this has clicked. */
 const kDragPx = 8;
 
 /** In the user's order; cameras that they never moved come after the others, as the server lists them. */
-export function inOwnOrder(cameras: readonly Camera[]): Camera[] {
-  const order = storedOrder();
+export function inOwnOrder(preferences: Preferences, cameras: readonly Camera[]): Camera[] {
+  const order = preferredOrder(preferences);
   const place = ({ id }: Camera) => (order.includes(id) ? order.indexOf(id) : order.length);
   return [...cameras].sort((one, other) => place(one) - place(other));
 }
 
 /** `ids` may be some of the cameras: among those that are not shown now, they keep the places that they have. */
-export function keepOrder(ids: readonly number[]): void {
-  localStorage.setItem(kStorageKey, JSON.stringify(mergedOrder(storedOrder(), ids)));
-}
-
-export function mergedOrder(before: readonly number[], ids: readonly number[]): number[] {
+export function keepOrder(preferences: Preferences, ids: readonly number[]): void {
   const rest = [...ids];
-  return [...before.map((id) => (ids.includes(id) ? rest.shift()! : id)), ...rest];
+  const merged = preferredOrder(preferences).map((id) => (ids.includes(id) ? rest.shift()! : id));
+  preferences.set(kName, [...merged, ...rest]);
 }
 
-function storedOrder(): number[] {
-  try {
-    const stored: unknown = JSON.parse(localStorage.getItem(kStorageKey) ?? "[]");
-    return Array.isArray(stored) ? stored.filter((id): id is number => typeof id === "number") : [];
-  } catch {
-    return [];
-  }
+function preferredOrder(preferences: Preferences): number[] {
+  const preferred = preferences.get(kName);
+  return Array.isArray(preferred) ? preferred.filter((id): id is number => typeof id === "number") : [];
 }
 
 /**

@@ -70,7 +70,6 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.locator(".list-note", { hasText: "Nothing found." }).waitFor();
     await field.fill("");
     await page.locator(".list-head", { hasText: "event" }).waitFor();
-    await page.evaluate(() => localStorage.clear());
     archive.recorded.pop();
   }, 40_000);
 
@@ -94,7 +93,6 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.waitForURL(/#event=40&/);
     await page.locator(".row-still.loaded").first().waitFor();
     expect(new Set(archive.stills).size).toBeLessThan(40);
-    await page.evaluate(() => localStorage.clear());
     archive.recorded.splice(archive.recorded.findIndex(({ id }) => id === 5), 3);
   }, 40_000);
 
@@ -144,7 +142,6 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.route(/Event&version=1&method=Get&/, (route) => route.abort());
     await page.locator("[data-ref^=event]:not([data-ref=event14]) button").first().click();
     await page.locator(".keep-button[title='The server does not answer.']").waitFor();
-    await page.evaluate(() => localStorage.clear());
   }, 40_000);
 
   test("a span is chosen by keys, by a handle and by camera; its size is told; it is downloaded", async () => {

@@ -141,7 +141,6 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await vi.waitFor(async () => expect(await seen()).toEqual(second));
     await page.reload();
     await vi.waitFor(async () => expect(await seen()).toEqual(second), 10_000);
-    await page.evaluate(() => localStorage.clear());
   }, 40_000);
 
   test("the same moment on all cameras, from a card of the list and from the player", async () => {

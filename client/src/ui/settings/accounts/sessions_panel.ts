@@ -13,13 +13,19 @@ import { plainTable, scrolled } from "../../widgets/table";
 import { minuteText } from "../../widgets/text";
 
 export class SessionsPanel {
-  readonly root = element("div", { class: "form-group" });
+  readonly root = element("div", { class: "form-group", tabindex: "-1", role: "group", "aria-label": "Sessions" });
   readonly #accounts: Accounts;
-  readonly #user: number;
+  readonly #user: number | undefined;
+  readonly #host: HTMLElement;
 
-  constructor(accounts: Accounts, user: number) {
+  /**
+   * `user`: undefined for the caller's own account. `host` is what the dialog that asks goes away with; where a form is
+   * around the panel, one outside of it.
+   */
+  constructor(accounts: Accounts, user: number | undefined, host?: HTMLElement) {
     this.#accounts = accounts;
     this.#user = user;
+    this.#host = host ?? this.root;
     void this.load();
   }
 
@@ -58,11 +64,11 @@ export class SessionsPanel {
     } catch (error) {
       notify(asServerError(error).message);
     }
-    await this.load();
+    await this.#reload();
   }
 
   async #endAll(count: number): Promise<void> {
-    const isDone = await openDialog(this.root, {
+    const isDone = await openDialog(this.#host, {
       title: `End ${counted(count, "session")}?`,
       content: [element("p", {}, "Whoever uses them must log in again.")],
       submit: "End them",
@@ -70,6 +76,12 @@ export class SessionsPanel {
         notify(`${counted(await this.#accounts.endSessions(this.#user), "session")} ended.`);
       },
     });
-    if (isDone) await this.load();
+    if (isDone) await this.#reload();
+  }
+
+  /** The button that was pressed goes with what was shown, and must not take the focus with it. */
+  async #reload(): Promise<void> {
+    await this.load();
+    this.root.focus();
   }
 }

@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the account prefers: asked for once, after the log-in, then known at once; what changes is told to the server a
+// moment later.
+//
+// Why so        On the server it follows the account to every browser, and stays apart where two accounts share one. A
+//               server that fails holds nobody up: a session without what was preferred is better than none.
+//               What belongs to a device alone stays with it: notifications (alert_notifications). Sound and full
+//               screen take a click each time, without which browsers allow neither.
+// Invariants    (1) Only what was changed here is told, by name: what another tab changes stays.
+//               (2) It is told for the account that was asked for: once somebody else has logged in in another tab,
+//                   the server refuses it.
+
+import { asServerError, type Server } from "./server";
+import { forgetKeptByBrowser, keptByBrowser } from "./browser_preferences";
+
+const kApi = "VEXO.User";
+const kTimeoutMs = 5_000;
+/** What changes in quick succession is told at once. */
+const kSettleMs = 1_000;
+
+type Values = Record<string, unknown>;
+
+export class Preferences {
+  readonly #server: Server;
+  readonly #user: number;
+  readonly #values: Values;
+  /** Of these, what the server has not taken. */
+  #changes: Values = {};
+  #takesOver = false;
+  #settling: ReturnType<typeof setTimeout> | undefined;
+  #telling: Promise<void> = Promise.resolve();
+  readonly #closing = new AbortController();
+
+  private constructor(server: Server, user: number, values: Values) {
+    this.#server = server;
+    this.#user = user;
+    this.#values = values;
+    // A page that is left may get no other moment.
+    const { signal } = this.#closing;
+    document.addEventListener("visibilitychange", () => void (document.hidden && this.#tell()), { signal });
+    addEventListener("pagehide", () => void this.#tell(), { signal });
+  }
+
+  /** Those of the session's account. Never rejects: where the server does not say, there are none. */
+  static async load(server: Server, user: number): Promise<Preferences> {
+    const how = { json: {}, quiet: true, timeoutMs: kTimeoutMs };
+    const answer = server.call<{ preferences?: Values }>(kApi, "Preferences", {}, how);
+    const values = await answer.then(({ preferences }) => preferences, () => undefined);
+    const preferences = new Preferences(server, user, { ...values });
+    if (values) preferences.#takeOver();
+    return preferences;
+  }
+
+  /** Undefined for what was never chosen. Of any type: an older or newer client may have written it. */
+  get(name: string): unknown {
+    return this.#values[name];
+  }
+
+  set(name: string, value: unknown): void {
+    if (JSON.stringify(value) === JSON.stringify(this.#values[name])) return;
+    this.#values[name] = this.#changes[name] = value;
+    clearTimeout(this.#settling);
+    this.#settling = setTimeout(() => void this.flush(), kSettleMs);
+  }
+
+  /** Resolves once the server has been told; never rejects. */
+  flush(): Promise<void> {
+    return (this.#telling = this.#telling.then(() => this.#tell()));
+  }
+
+  /** The session is over: what was not told is lost. */
+  close(): void {
+    clearTimeout(this.#settling);
+    this.#closing.abort();
+    this.#changes = {};
+  }
+
+  async #tell(): Promise<void> {
+    clearTimeout(this.#settling);
+    const changes = this.#changes;
+    if (Object.keys(changes).length === 0) return;
+    this.#changes = {};
+    const json = { id: this.#user, preferences: changes };
+    try {
+      const how = { json, quiet: true, keepalive: true, timeoutMs: kTimeoutMs };
+      await this.#server.call<unknown>(kApi, "SetPreferences", {}, how);
+    } catch (error) {
+      const { status } = asServerError(error);
+      // What could not be told is told with the next change; what was refused would be refused again.
+      if (status === 0 || status === 429 || status >= 500) {
+        if (!this.#closing.signal.aborted) this.#changes = { ...changes, ...this.#changes };
+        return;
+      }
+    }
+    if (this.#takesOver) forgetKeptByBrowser();
+  }
+
+  #takeOver(): void {
+    this.#takesOver = true;
+    for (const [name, value] of Object.entries(keptByBrowser())) if (!(name in this.#values)) this.set(name, value);
+    if (Object.keys(this.#changes).length === 0) forgetKeptByBrowser();
+  }
+}
