@@ -37,6 +37,7 @@ constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
 constexpr std::size_t kMaxBody = std::size_t{1} << 20;
 constexpr const char* kManagersOnly = "only a manager may do this";
 constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
+constexpr const char* kStoreUnavailable = "the record store is not available; the server's log says why";
 
 // Not under a sanitizer, which maps terabytes before main.
 void LimitAddressSpace(rlim_t max_bytes) {
@@ -124,7 +125,12 @@ std::string RunModule(EntryFunction entry, const Call& call) {
     if (call.context.output()->BytesSent() > 0) {
         return "";
     }
-    if (call.context.HasStoreFailed()) {
+    switch (call.context.WorstStoreFailure()) {
+    case binding::RequestContext::StoreFailure::kNone:
+        break;
+    case binding::RequestContext::StoreFailure::kUnavailable:
+        throw Failure(503, kStoreUnavailable, http::kRetrySoonSeconds);
+    case binding::RequestContext::StoreFailure::kFailed:
         throw Failure(500, kStoreFailed);
     }
     if (given.answer && given.output_enabled) {
@@ -216,6 +222,9 @@ std::string ServeOrFail(const Service& service, http::Request& request, control:
         return fail(Failure(400, "a parameter has the wrong type"));
     } catch (const std::bad_alloc&) {
         return fail(Failure(500, "the answer needs too much memory; ask for less at once"));
+    } catch (const store::StoreUnavailable& error) {
+        base::LogError(std::string("the request failed: ") + error.what());
+        return fail(Failure(503, kStoreUnavailable, http::kRetrySoonSeconds));
     } catch (const store::StoreError& error) {
         base::LogError(std::string("the request failed: ") + error.what());
         return fail(Failure(500, kStoreFailed));

@@ -125,8 +125,11 @@ void RequestContext::NoteStream() {
 
 void LogFailure(const char* name, const std::exception& error) {
     base::LogError(std::string(name) + ": " + error.what());
-    if (dynamic_cast<const store::StoreError*>(&error) != nullptr) {
-        RequestContext::Current().NoteStoreFailure();
+    using Failure = RequestContext::StoreFailure;
+    if (dynamic_cast<const store::StoreUnavailable*>(&error) != nullptr) {
+        RequestContext::Current().NoteStoreFailure(Failure::kUnavailable);
+    } else if (dynamic_cast<const store::StoreError*>(&error) != nullptr) {
+        RequestContext::Current().NoteStoreFailure(Failure::kFailed);
     }
 }
 

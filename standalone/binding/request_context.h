@@ -7,6 +7,7 @@
 // Thread safety One thread.
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -145,8 +146,9 @@ class LH_PLATFORM_API RequestContext {
     void NoteHidden() { is_hidden_ = true; }
 
     // The store has failed, so what the module takes for an empty list or a missing record is none.
-    void NoteStoreFailure() { has_store_failed_ = true; }
-    bool HasStoreFailed() const { return has_store_failed_; }
+    enum class StoreFailure { kNone, kUnavailable, kFailed };
+    void NoteStoreFailure(StoreFailure failure) { store_failure_ = std::max(store_failure_, failure); }
+    StoreFailure WorstStoreFailure() const { return store_failure_; }
 
     // The ring entry that was read last and not given back; null when there is none.
     const ring::Entry* HeldEntry() const { return held_entry_; }
@@ -172,7 +174,7 @@ class LH_PLATFORM_API RequestContext {
     bool is_stream_ = false;
     bool wants_picture_ = false;
     bool is_hidden_ = false;
-    bool has_store_failed_ = false;
+    StoreFailure store_failure_ = StoreFailure::kNone;
     const ring::Entry* held_entry_ = nullptr;
     RecordedPicture last_recorded_;
 };

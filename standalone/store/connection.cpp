@@ -79,8 +79,20 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
             session_ << "set statement_timeout = '5s'";
         }
     } catch (const soci::soci_error& error) {
-        throw StoreError("cannot open the record store: " + error.get_error_message());
+        const std::string problem = "cannot open the record store: " + error.get_error_message();
+        if (engine_ == Engine::kPostgresql) {
+            throw StoreUnavailable(problem);
+        }
+        throw StoreError(problem);
     }
+}
+
+void Connection::Fail(const soci::soci_error& error) const {
+    const std::string problem = "the record store failed: " + error.get_error_message();
+    if (!session_.is_connected()) {
+        throw StoreUnavailable(problem);
+    }
+    throw StoreError(problem);
 }
 
 bool Connection::HasTable(const std::string& name) {

@@ -37,19 +37,20 @@ struct StoreAddress {
 
 class Connection {
   public:
-    // Opens the file or connects; creates an absent SQLite file. Throws StoreError.
+    // Opens the file or connects; creates an absent SQLite file. Throws StoreError, of a server StoreUnavailable.
     explicit Connection(const StoreAddress& address);
 
     bool IsSqlite() const { return engine_ == Engine::kSqlite; }
     bool HasTable(const std::string& name);
 
-    // Calls ask(session). Throws StoreError where the engine fails; its text never holds a parameter's value.
+    // Calls ask(session). Throws StoreError where the engine fails, StoreUnavailable where its server is gone; the text
+    // never holds a parameter's value.
     template <typename Ask>
     auto Read(Ask&& ask) {
         try {
             return ask(session_);
         } catch (const soci::soci_error& error) {
-            throw StoreError("the record store failed: " + error.get_error_message());
+            Fail(error);
         } catch (const std::bad_optional_access&) {
             throw StoreError("the record store is damaged: a row that is always there is missing");
         }
@@ -98,6 +99,8 @@ class Connection {
     }
 
   private:
+    [[noreturn]] void Fail(const soci::soci_error& error) const;
+
     class Transaction {
       public:
         Transaction(Connection& connection, Durability durability, LockWait lock_wait);

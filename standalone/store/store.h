@@ -27,6 +27,12 @@ class StoreError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+// The database server cannot be reached, or the connection to it was lost: what fails for that alone may be tried again.
+class StoreUnavailable : public StoreError {
+  public:
+    using StoreError::StoreError;
+};
+
 // The schema is missing, older or newer than this program's; the text says what to do.
 class SchemaError : public StoreError {
   public:

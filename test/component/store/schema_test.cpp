@@ -146,6 +146,16 @@ TEST_P(StoreTest, HostileTextIsRefusedOrKeptExactly) {
     }
 }
 
+TEST_P(StoreTest, ALostServerIsToldFromAFailingStore) {
+    EXPECT_THROW(store_.connection().Read([](soci::session& sql) { sql << "select nonsense"; }), StoreError);
+    EXPECT_NO_THROW(store_.connection().Read([](soci::session& sql) { sql << "select 1"; }));
+    if (GetParam() == Engine::kPostgresql) {
+        const auto end = [](soci::session& sql) { sql << "select pg_terminate_backend(pg_backend_pid())"; };
+        EXPECT_THROW(store_.connection().Read(end), StoreUnavailable);
+        EXPECT_THROW(Store::Open("postgresql:host=/nonexistent"), StoreUnavailable);
+    }
+}
+
 LOOKHAVEN_ON_BOTH_ENGINES(StoreTest);
 
 class SqliteTest : public EmptyStore {};
