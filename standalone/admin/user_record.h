@@ -17,7 +17,8 @@ Json::Value UserRecord(store::Store& store, const store::User& user);
 // Throws store::InvalidRecord for another word.
 store::Privilege PrivilegeFrom(const std::string& name);
 
-// {"live": [1, 2], "playback": [], "audio": [], "group": {"live": [], …}, "emap": [], "door": [], "ioModule": []}
+// {"live": [1, 2], "playback": [], "audio": [], "export": [], "group": {"live": [], …}, "emap": [], "door": [],
+// "ioModule": []}
 Json::Value ToJson(const store::Denials& denials);
 // Of such an object; what is missing denies nothing. Throws store::InvalidRecord for anything else.
 store::Denials DenialsFrom(const Json::Value& json);

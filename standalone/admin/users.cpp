@@ -210,12 +210,13 @@ std::vector<VisibleCamera> CamerasAsSeenBy(store::Store& store, int user_id) {
     const std::set<int> not_live = users.DeniedCameras(user_id, CameraAccess::kLive);
     const std::set<int> not_heard = users.DeniedCameras(user_id, CameraAccess::kAudio);
     const std::set<int> not_played = users.DeniedCameras(user_id, CameraAccess::kPlayback);
+    const std::set<int> not_exported = users.DeniedCameras(user_id, CameraAccess::kExport);
     std::vector<VisibleCamera> cameras;
     const auto add = [&](const auto& camera) {
         const bool live = !not_live.contains(camera.id);
         const bool played = !not_played.contains(camera.id);
         const bool heard = camera.audio && (live || played) && !not_heard.contains(camera.id);
-        cameras.push_back({camera.id, camera.name, live, heard, played});
+        cameras.push_back({camera.id, camera.name, live, heard, played, !not_exported.contains(camera.id)});
     };
     std::ranges::for_each(store::Cameras(store).List(), add);
     std::ranges::for_each(store::RecordingServers(store).ListCameras(), add);

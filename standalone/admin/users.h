@@ -60,6 +60,7 @@ struct VisibleCamera {
     bool live = false;
     bool audio = false;
     bool playback = false;
+    bool exported = false;  // its recordings, as files
 };
 // All cameras, those of recording servers too, by id. Throws store::NotFound.
 std::vector<VisibleCamera> CamerasAsSeenBy(store::Store& store, int user_id);

@@ -1,7 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see, and how the cameras are.
+// VEXO.Catalog: the camera groups, mounts and e-maps that the caller may see, how the cameras are, and what the caller
+// may do with each.
 #include "standalone/api/own_apis.h"
+
+#include <algorithm>
+#include <map>
+#include <set>
 
 #include "platform/camera/camgroup.h"
 #include "platform/privilege/privprofile.h"
@@ -13,6 +18,8 @@
 #include "standalone/store/emaps.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/servers.h"
+#include "standalone/store/value_names.h"
 
 namespace lookhaven::api {
 
@@ -107,8 +114,32 @@ std::string CameraStates(const Call& call) {
     return SuccessAnswer(data);
 }
 
+// Of the cameras that the caller may watch or play back, those of recording servers too.
+std::string Rights(const Call& call) {
+    using store::CameraAccess;
+    std::map<CameraAccess, std::set<int>> denied;
+    for (const CameraAccess kind : store::kEveryAccess) {
+        denied[kind] = binding::DeniedCameras(kind);
+    }
+    Json::Value data;
+    Json::Value& list = data["camera"] = Json::arrayValue;
+    const auto add = [&](const auto& camera) {
+        const auto may = [&](CameraAccess kind) { return !denied[kind].contains(camera.id); };
+        if (may(CameraAccess::kLive) || may(CameraAccess::kPlayback)) {
+            Json::Value& json = list.append(Json::objectValue);
+            json["id"] = camera.id;
+            for (const auto& [name, kind] : store::CameraAccessNames()) {
+                json[name] = may(kind);
+            }
+        }
+    };
+    std::ranges::for_each(store::Cameras(call.Records()).List(), add);
+    std::ranges::for_each(store::RecordingServers(call.Records()).ListCameras(), add);
+    return SuccessAnswer(data);
+}
+
 constexpr Method kMethods[] = {
-    {"CameraStates", CameraStates}, {"Groups", Groups}, {"Mounts", Mounts}, {"Emaps", Emaps}};
+    {"CameraStates", CameraStates}, {"Groups", Groups}, {"Mounts", Mounts}, {"Emaps", Emaps}, {"Rights", Rights}};
 
 }  // namespace
 

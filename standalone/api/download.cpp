@@ -31,7 +31,7 @@ std::string TitleOf(const Call& call, const Footage& footage) {
 }  // namespace
 
 std::string Download(const Call& call) {
-    const Footage footage = RequireFootage(call);
+    const Footage footage = RequireFootage(call, store::CameraAccess::kExport);
     media::ExportOptions options;
     options.with_sound = binding::MayUse(footage.camera_id, store::CameraAccess::kAudio);
     const std::string name = TitleOf(call, footage) + ".mkv";

@@ -65,7 +65,7 @@ evidence::CameraFootage FootageOf(const Call& call, int id, const archive::TimeS
                                                         .begin_s = span.begin_ms / 1000,
                                                         .end_s = span.end_ms / 1000,
                                                         .limit = static_cast<int>(left) + 1});
-    if (!binding::MayUse(id, store::CameraAccess::kPlayback) || (!camera && events.empty())) {
+    if (!binding::MayUse(id, store::CameraAccess::kExport) || (!camera && events.empty())) {
         throw Failure(404, kNoSuchCamera);
     }
     if (events.size() > left) {

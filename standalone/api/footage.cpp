@@ -29,13 +29,12 @@ std::optional<Footage> Find(store::Store& records, std::optional<store::MarkKind
     return event && !event->demo ? std::optional(Of(*event)) : std::nullopt;
 }
 
-Footage Require(const Call& call, std::optional<Footage> footage) {
+Footage Require(const Call& call, std::optional<Footage> footage, store::CameraAccess access) {
     const auto mount = footage ? store::Mounts(call.Records()).Find(footage->mount_id) : std::nullopt;
     if (mount) {
         footage->path = std::filesystem::path(mount->path) / footage->path;
     }
-    if (!mount || !binding::MayUse(footage->camera_id, store::CameraAccess::kPlayback) ||
-        !std::filesystem::exists(footage->path)) {
+    if (!mount || !binding::MayUse(footage->camera_id, access) || !std::filesystem::exists(footage->path)) {
         throw Failure(404, "there is no such event, or no footage of it");
     }
     return *std::move(footage);
@@ -56,13 +55,13 @@ std::optional<store::MarkKind> KindOf(const Call& call) {
     return found->second;
 }
 
-Footage RequireFootage(const Call& call) {
+Footage RequireFootage(const Call& call, store::CameraAccess access) {
     const auto kind = KindOf(call);
-    return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()));
+    return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()), access);
 }
 
 Footage RequireFootage(const Call& call, const store::Event& event) {
-    return Require(call, event.demo ? std::nullopt : std::optional(Of(event)));
+    return Require(call, event.demo ? std::nullopt : std::optional(Of(event)), store::CameraAccess::kPlayback);
 }
 
 archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, std::int64_t until_ms) {

@@ -12,6 +12,7 @@
 #include "standalone/archive/recording_reader.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/users.h"
 
 namespace lookhaven::api {
 
@@ -29,10 +30,10 @@ struct Footage {
 // The call's parameter "kind". Throws Failure 400 for what is neither "alert" nor "pos"; nothing when it is missing.
 std::optional<store::MarkKind> KindOf(const Call& call);
 
-// The call's event and kind. Throws Failure 404 when there is no such event, it has no footage, or the caller may not
-// see it.
-Footage RequireFootage(const Call& call);
-// The footage of a row that was found. As above.
+// The call's event and kind. Throws Failure 404 when there is no such event, it has no footage, or the caller lacks
+// that access to its camera.
+Footage RequireFootage(const Call& call, store::CameraAccess access = store::CameraAccess::kPlayback);
+// The footage of a row that was found, to play it back. As above.
 Footage RequireFootage(const Call& call, const store::Event& event);
 
 // Opens it, with all that the recorder has of it up to that time. Closes the store. Throws Failure 404 when nothing is

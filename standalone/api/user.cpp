@@ -145,6 +145,7 @@ std::string Preview(const Call& call) {
                                    json["live"] = camera.live;
                                    json["audio"] = camera.audio;
                                    json["playback"] = camera.playback;
+                                   json["export"] = camera.exported;
                                });
     return SuccessAnswer(data);
 }

@@ -5,6 +5,7 @@
 // Format        {"privilege": 2, "deniedCameras": [3, 7], "deniedAudio": [4]}; each may be missing. A denied camera is
 //               denied for every kind of access.
 #include <algorithm>
+#include <initializer_list>
 #include <map>
 #include <stdexcept>
 
@@ -25,6 +26,10 @@ static_assert(store::kPairedHostUserId == PAIR_AUTH_UID);
 namespace lookhaven::binding {
 
 namespace {
+
+// What the module asks profiles about.
+constexpr std::initializer_list<store::CameraAccess> kProfileAccess = {
+    store::CameraAccess::kLive, store::CameraAccess::kPlayback, store::CameraAccess::kAudio};
 
 // A restriction that is not understood cannot be applied, so the request must fail rather than go on unrestricted.
 void RequireKnownShape(const Json::Value& priv_data) {
@@ -156,7 +161,7 @@ struct PrivProfile::Data {
 
     void Restrict(const lookhaven::binding::Restrictions& restrictions) {
         privilege = std::max(privilege, static_cast<int>(restrictions.privilege));
-        for (const store::CameraAccess kind : store::kEveryAccess) {
+        for (const store::CameraAccess kind : lookhaven::binding::kProfileAccess) {
             restrictions.AddTo(denied_cameras[static_cast<int>(kind)], kind);
         }
     }
@@ -222,7 +227,7 @@ PrivProfile PrivProfileGetByUid(unsigned int uid) {
             }
             data->id = user->id;
             data->privilege = static_cast<int>(user->privilege);
-            for (const store::CameraAccess kind : store::kEveryAccess) {
+            for (const store::CameraAccess kind : lookhaven::binding::kProfileAccess) {
                 data->denied_cameras[static_cast<int>(kind)] =
                     is_caller ? lookhaven::binding::DeniedToAccount(kind) : Users().DeniedCameras(user->id, kind);
             }

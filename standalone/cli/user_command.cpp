@@ -169,10 +169,13 @@ std::vector<CameraAccess> KindsOf(const Request& request) {
 // The end of the answer.
 std::string EndOfAllowance(Users& users, int user, const Request& request) {
     const std::vector<CameraAccess> kinds = KindsOf(request);
-    const bool still_denied = request.camera && std::ranges::any_of(kinds, [&](CameraAccess kind) {
-                                  return users.DeniedCameras(user, kind).contains(*request.camera);
-                              });
-    return still_denied ? ", but belongs to a group that is denied." : ".";
+    const auto is_denied = [&](CameraAccess kind) { return users.DeniedCameras(user, kind).contains(*request.camera); };
+    if (!request.camera || std::ranges::none_of(kinds, is_denied)) {
+        return ".";
+    }
+    return kinds == std::vector{CameraAccess::kExport} && is_denied(CameraAccess::kPlayback)
+               ? ", but playback of it is denied, without which nothing is exported."
+               : ", but belongs to a group that is denied.";
 }
 
 // The item that the request names; null when it names a camera or group.

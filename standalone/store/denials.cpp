@@ -95,6 +95,11 @@ bool ReplaceRows(soci::session& sql, const DenialTable& table, int user, const s
     return !added.empty();
 }
 
+// The access without which there is none of that kind; the kind itself where it takes no other.
+CameraAccess TakenBy(CameraAccess kind) {
+    return kind == CameraAccess::kExport ? CameraAccess::kPlayback : kind;
+}
+
 void RequireGroup(soci::session& sql, int id) {
     Require(FetchOne<int>(sql, "select id from camera_groups where id = :id", id), "camera group", id);
 }
@@ -150,10 +155,11 @@ void Users::AllowItem(int id, DeniableItem kind, int item_id) {
 
 std::set<int> Users::DeniedCameras(int id, CameraAccess kind) {
     return connection_.FetchAll<int, std::set<int>>(
-        "select camera_id from denied_cameras where user_id = :user and access = :access"
+        "select camera_id from denied_cameras where user_id = :user and access in (:access, :taken)"
         " union select camera_id from group_cameras join denied_groups"
-        " on denied_groups.group_id = group_cameras.group_id where user_id = :member and access = :group_access",
-        id, kind, id, kind);
+        " on denied_groups.group_id = group_cameras.group_id"
+        " where user_id = :member and access in (:group_access, :group_taken)",
+        id, kind, TakenBy(kind), id, kind, TakenBy(kind));
 }
 
 std::set<int> Users::DeniedGroups(int id, CameraAccess kind) {

@@ -20,10 +20,11 @@ constexpr int kPairedHostUserId = 1024;
 
 enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
 
-// What a user may be denied at a camera or a group of them; the numbers are stored.
-enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8 };
+// What a user may be denied at a camera or a group of them; the numbers are stored. Export is of whole recordings as
+// files, which nobody gets who may not play them: a denial of playback is one of export, too.
+enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8, kExport = 16 };
 constexpr std::initializer_list<CameraAccess> kEveryAccess = {CameraAccess::kLive, CameraAccess::kPlayback,
-                                                              CameraAccess::kAudio};
+                                                              CameraAccess::kAudio, CameraAccess::kExport};
 
 // What else may be denied; the numbers are those of e-map items, and are stored.
 enum class DeniableItem : int { kEmap = 1, kDoor = 2, kIoModule = 3 };
@@ -111,8 +112,8 @@ class Users {
     void AllowMarks(int id);
     void Remove(int id);
 
-    // The cameras at which the user lacks that access, by themselves or as members of a denied group; empty for an
-    // unknown user.
+    // The cameras at which the user lacks that access, by themselves or as members of a denied group, or with what it
+    // takes; empty for an unknown user.
     std::set<int> DeniedCameras(int id, CameraAccess kind);
     std::set<int> DeniedGroups(int id, CameraAccess kind);
     std::set<int> DeniedItems(int id, DeniableItem kind);

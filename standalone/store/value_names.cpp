@@ -16,8 +16,10 @@ const base::Names<Privilege>& PrivilegeNames() {
 }
 
 const base::Names<CameraAccess>& CameraAccessNames() {
-    static const base::Names<CameraAccess> names = {
-        {"live", CameraAccess::kLive}, {"playback", CameraAccess::kPlayback}, {"audio", CameraAccess::kAudio}};
+    static const base::Names<CameraAccess> names = {{"live", CameraAccess::kLive},
+                                                    {"playback", CameraAccess::kPlayback},
+                                                    {"audio", CameraAccess::kAudio},
+                                                    {"export", CameraAccess::kExport}};
     return names;
 }
 

@@ -13,7 +13,7 @@ namespace lookhaven::store {
 
 const base::Names<RecordMode>& RecordModeNames();      // always, never, schedule
 const base::Names<Privilege>& PrivilegeNames();        // owner, manager, viewer
-const base::Names<CameraAccess>& CameraAccessNames();  // live, playback, audio
+const base::Names<CameraAccess>& CameraAccessNames();  // live, playback, audio, export
 const base::Names<MarkKind>& MarkKindNames();          // alert, pos
 const base::Names<EmapItemType>& DeviceKindNames();    // door, io, pos
 const base::Names<PortType>& PortTypeNames();          // in, out

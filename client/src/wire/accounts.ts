@@ -7,9 +7,13 @@ import type { Server } from "./server";
 
 export const kPrivileges = ["viewer", "manager", "owner"] as const;
 export type Privilege = (typeof kPrivileges)[number];
-/** What a right to a camera can be denied for. */
-export const kCameraRights = ["live", "audio", "playback"] as const;
+/** What a right to a camera can be denied for. Export is of recordings as files; there is none without playback. */
+export const kCameraRights = ["live", "audio", "playback", "export"] as const;
 export type CameraRight = (typeof kCameraRights)[number];
+
+export function byRight<Value>(value: (right: CameraRight) => Value): Record<CameraRight, Value> {
+  return Object.fromEntries(kCameraRights.map((right) => [right, value(right)])) as Record<CameraRight, Value>;
+}
 
 /** Ids of what a viewer may not see. */
 export interface Denied extends Record<CameraRight, number[]> {

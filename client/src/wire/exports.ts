@@ -39,6 +39,13 @@ export class Exports {
     return { sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
   }
 
+  /** The cameras whose recordings the caller may play, but not take away. */
+  async denied(): Promise<Set<number>> {
+    type Rights = { id: number; playback: boolean; export: boolean };
+    const { camera } = await this.#server.call<{ camera: Rights[] }>("VEXO.Catalog", "Rights", {});
+    return new Set(camera.filter((one) => one.playback && !one.export).map(({ id }) => id));
+  }
+
   address(cameras: readonly number[], fromS: number, toS: number): string {
     const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
     return address(kApi, "Export", { ...asked, ...zoneAt(fromS) });

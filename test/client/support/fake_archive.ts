@@ -44,6 +44,8 @@ export class FakeArchive {
   /** The events of which a still was asked for. */
   readonly stills: string[] = [];
   playersPerSession = 1;
+  /** Cameras whose recordings the account may play, but not take away. */
+  notExported: number[] = [];
   /** The server does not answer. */
   isAway = false;
   framesPerSecond = 100;
@@ -114,6 +116,8 @@ export class FakeArchive {
         });
       case "VEXO.Catalog Groups":
         return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
+      case "VEXO.Catalog Rights":
+        return json({ camera: [1, 2].map((id) => ({ id, live: true, audio: true, playback: true, export: !this.notExported.includes(id) })) });
       case "VEXO.Playback SetRate": {
         const stream = this.streams.find(({ key }) => key === number("timestamp"));
         if (stream) stream.rate = number("rate");

@@ -226,6 +226,22 @@ TEST_P(UserTest, SessionsAreOfOnesOwnOrForManagers) {
     EXPECT_THAT(SessionsOf(store_, viewer_, viewer_.user_id), testing::SizeIs(1));
 }
 
+TEST_P(UserTest, ExportsAreDeniedByThemselvesAndWithPlayback) {
+    for (int i = 0; i < 3; ++i) {
+        AddCamera();
+    }
+    SetUser(store_, {}, viewer_.user_id, {}, {.denials = [](store::Denials& denials) {
+                denials.cameras = {{CameraAccess::kExport, {1}}, {CameraAccess::kPlayback, {2}}};
+            }});
+    std::string seen;
+    for (const VisibleCamera& camera : CamerasAsSeenBy(store_, viewer_.user_id)) {
+        seen += std::string(camera.playback ? "plays" : "") + (camera.exported ? "exports" : "") + ";";
+    }
+    EXPECT_EQ(seen, "plays;;playsexports;");
+    const store::AuditEntry entry = store::AuditLog(store_).List(0, 1).at(0);
+    EXPECT_THAT(entry.after, testing::HasSubstr(R"("export":[1])"));
+}
+
 LOOKHAVEN_ON_BOTH_ENGINES(UserTest);
 
 }  // namespace

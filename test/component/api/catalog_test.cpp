@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Catalog: states of cameras, groups and mounts, as far as the caller may see them.
+// VEXO.Catalog: states of cameras, groups, mounts and rights, as far as the caller may see them.
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/recording_status.h"
 #include "standalone/store/groups.h"
@@ -57,6 +57,27 @@ TEST_F(CatalogApi, ListsGroupsAndMountsThatTheCallerMaySee) {
     EXPECT_EQ(listed("Groups", "group", true), "Front:1 ");
     EXPECT_EQ(listed("Mounts", "mount", false), "Disk:1 2 3 Empty:");
     EXPECT_EQ(listed("Mounts", "mount", true), "Disk:1 ");
+}
+
+TEST_F(CatalogApi, TellsWhatTheCallerMayDoWithTheCamerasThatHeMaySee) {
+    store::Users(footage_.Records()).Deny(2, 1, {store::CameraAccess::kExport});
+    store::Users(footage_.Records()).Deny(2, 3, {store::CameraAccess::kAudio});
+    viewer_ = host_.LogIn("guest").secret;
+    const auto told = [&](bool as_viewer) {
+        std::string text;
+        const Json::Value answer = Ask("Catalog&version=1&method=Rights", "", as_viewer).Json();
+        for (const Json::Value& camera : answer["data"]["camera"]) {
+            text += camera["id"].asString();
+            for (const char* right : {"live", "audio", "playback", "export"}) {
+                text += camera[right].asBool() ? std::string(" ") + right : "";
+            }
+            text += ';';
+        }
+        return text;
+    };
+    const std::string all = " live audio playback export;";
+    EXPECT_EQ(told(false), "1" + all + "2" + all + "3" + all);
+    EXPECT_EQ(told(true), "1 live audio playback;3 live;") << "2 is denied, and nobody exports what they may not play";
 }
 
 }  // namespace

@@ -168,6 +168,34 @@ TEST_F(EventApi, KeepsFootageFromWhomItIsDenied) {
     EXPECT_EQ(Ask(download).status, 404) << "a file that is gone";
 }
 
+TEST_F(EventApi, WhoMayPlayButNotExportSeesPicturesAndGetsNoFile) {
+    const std::string event = std::to_string(footage_.Record(1, 1'772'366'400, 2));
+    const std::string alert = std::to_string(footage_.Mark(1, 1, 1'772'366'400, 1, "door", std::stoi(event)));
+    store::Users(footage_.Records()).Deny(2, 1, {store::CameraAccess::kExport});
+    viewer_ = host_.LogIn("guest").secret;
+    const std::string span = "&from=1772366400&to=1772366402&cameralists=";
+    const struct {
+        std::string request, absent;  // absent: the same of what is not there; empty where the caller may
+    } rows[] = {
+        {"Event&version=1&method=Get&event=" + event, ""},
+        {"Event&version=1&method=Frame&time_ms=0&event=" + event, ""},
+        {"Picture&version=1&method=At&frame=0&event=" + event, ""},
+        {"Event&version=1&method=Download&event=" + event, "Event&version=1&method=Download&event=99"},
+        {"Event&version=1&method=Download&kind=alert&event=" + alert,
+         "Event&version=1&method=Download&kind=alert&event=99"},
+        {"Event&version=1&method=PlanExport" + span + "1", "Event&version=1&method=PlanExport" + span + "99"},
+        {"Event&version=1&method=Export" + span + "1", "Event&version=1&method=Export" + span + "99"},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(Ask(row.request).status, 200) << row.request;
+        const Answer answer = Ask(row.request, "", true);
+        EXPECT_EQ(answer.status, row.absent.empty() ? 200 : 404) << row.request;
+        if (!row.absent.empty()) {
+            EXPECT_EQ(answer.body, Ask(row.absent, "", true).body) << "hidden is absent";
+        }
+    }
+}
+
 TEST_F(EventApi, KeepsWhatAManagerSaysAndTellsWhoDid) {
     const int event = footage_.Record(1, 1'772'366'400, 30);
     const int hidden = footage_.Record(2, 1'772'366'400, 30);

@@ -26,7 +26,7 @@ class CopyTest : public StoreTest {
         AddCamera();
         Cameras(store_).SetCredentials(AddCamera(), Credentials{"admin", "x'; drop table users; --"});
         const int user = Users(store_).Add("bob", "correct horse", Privilege::kViewer).id;
-        Users(store_).Deny(user, 2, {CameraAccess::kAudio});
+        Users(store_).Deny(user, 2, {CameraAccess::kAudio, CameraAccess::kExport});
         Preferences(store_).Change(user, [](const std::string&) { return R"({"layout":"2"})"; });
         Settings(store_).Set("place", "Zürich :name $1 \\");
         Emaps(store_).Add({.name = "Ground floor"});
@@ -60,6 +60,8 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_TRUE(Users(copy).CheckPassword("BOB", "correct horse"));
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kAudio), ElementsAre(2));
         EXPECT_EQ(Preferences(copy).Find(1), R"({"layout":"2"})");
+        EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kExport), ElementsAre(2));
+        EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kPlayback), testing::IsEmpty());
         EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));
         EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));

@@ -125,6 +125,7 @@ TEST_P(PlaceTest, WhatIsDeniedOfAGroupIsDeniedOfItsCameras) {
     EXPECT_THAT(users_.DeniedCameras(user, CameraAccess::kLive), IsEmpty());
     EXPECT_THAT(users_.DeniedCameras(user, CameraAccess::kPlayback), ElementsAre(1, 2));
     EXPECT_THAT(users_.DeniedCameras(user, CameraAccess::kAudio), ElementsAre(1, 2, 3));
+    EXPECT_THAT(users_.DeniedCameras(user, CameraAccess::kExport), ElementsAre(1, 2)) << "what cannot be played";
     EXPECT_THAT(users_.DeniedGroups(user, CameraAccess::kPlayback), ElementsAre(yard));
     EXPECT_THAT(users_.DeniedGroups(user, CameraAccess::kLive), IsEmpty());
 

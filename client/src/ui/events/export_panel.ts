@@ -12,6 +12,7 @@ import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { calendarDate, clockTime, spanInWords } from "../widgets/text";
 
+const kDenied = "You may play the recordings of this camera, but not export them";
 const kSettleMs = 300;
 const kAroundMs = 60_000;
 /** As the server has them. */
@@ -31,6 +32,10 @@ export class ExportPanel {
   #span: Span = { fromMs: 0, toMs: 0 };
   #footage: Footage | null = null;
   #chosen = new Set<number>();
+  /** Whose recordings may not be taken away. */
+  #denied: ReadonlySet<number> = new Set();
+  /** Nothing may be taken away of any camera that is shown. */
+  #isDenied = false;
   #timer: ReturnType<typeof setTimeout> | undefined;
 
   /** `changed` is called with the span that is to be shown, null once the panel is closed. */
@@ -53,11 +58,17 @@ export class ExportPanel {
   open(cameras: readonly Camera[], onStage: readonly number[], footage: Footage | null, atMs: number): void {
     this.#footage = footage;
     this.#event.hidden = !footage;
-    this.#chosen = new Set(onStage.slice(0, kMaxCameras));
+    this.#chosen = new Set(onStage.filter((id) => !this.#denied.has(id)).slice(0, kMaxCameras));
     this.#cameraRow.replaceChildren(...cameras.map((camera) => this.#chip(camera)));
+    this.#isDenied = cameras.length > 0 && cameras.every(({ id }) => this.#denied.has(id));
     this.root.hidden = false;
     this.setSpan(footage ? spanOf(footage) : { fromMs: atMs - kAroundMs, toMs: Math.min(atMs + kAroundMs, Date.now()) }, true);
     this.#from.focus();
+  }
+
+  /** These cameras cannot be chosen from then on. */
+  deny(denied: ReadonlySet<number>): void {
+    this.#denied = denied;
   }
 
   close(): void {
@@ -77,13 +88,14 @@ export class ExportPanel {
   }
 
   #chip({ id, name }: Camera): HTMLElement {
-    const box = element("input", { type: "checkbox", checked: this.#chosen.has(id) });
+    const isDenied = this.#denied.has(id);
+    const box = element("input", { type: "checkbox", checked: this.#chosen.has(id), disabled: isDenied });
     box.addEventListener("change", () => {
       if (box.checked) this.#chosen.add(id);
       else this.#chosen.delete(id);
       this.#planSoon();
     });
-    return element("label", { class: "chip" }, box, name);
+    return element("label", { class: "chip", title: isDenied ? kDenied : "" }, box, isDenied ? `${name} (no export)` : name);
   }
 
   #readInputs(): void {
@@ -102,6 +114,7 @@ export class ExportPanel {
   #planSoon(): void {
     clearTimeout(this.#timer);
     const { fromMs, toMs } = this.#span;
+    if (this.#isDenied) return this.#tell("You may play these recordings, but not export them.");
     if (this.#chosen.size === 0) return this.#tell("Choose a camera.");
     if (this.#chosen.size > kMaxCameras) return this.#tell(`Choose at most ${kMaxCameras} cameras.`);
     if (toMs - fromMs > kMaxSpanMs) return this.#tell("Choose at most one day.");

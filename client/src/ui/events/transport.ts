@@ -33,6 +33,8 @@ export interface TransportActions {
 
 export const kJumpMs = 10_000;
 const kNoTime = "Go to a time";
+const kDownload = "Download this recording";
+const kMayNotDownload = "You may play the recordings of this camera, but not download them";
 
 export class Transport {
   readonly root: HTMLElement;
@@ -47,7 +49,9 @@ export class Transport {
   readonly #time = element("time", { class: "transport-time" }, kNoTime);
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
-  readonly #download = element("a", { class: "icon-button", role: "link", "aria-label": "Download this recording", title: "Download this recording" });
+  readonly #download = element("a", { class: "icon-button", role: "link", "aria-label": kDownload, title: kDownload });
+  /** Whose recordings may not be taken away. */
+  #denied: ReadonlySet<number> = new Set();
 
   constructor(
     playback: SyncPlayback,
@@ -114,8 +118,18 @@ export class Transport {
     const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
     setText(this.#frame, footage ? `frame ${(active?.player.index ?? 0) + 1}${frames}` : "");
     this.#keeping.show(footage);
-    if (footage) this.#download.href = downloadAddress(footage);
+    const mayDownload = !footage || !this.#denied.has(footage.camera);
+    if (footage && mayDownload) this.#download.href = downloadAddress(footage);
     else this.#download.removeAttribute("href");
+    this.#download.setAttribute("aria-disabled", String(!footage || !mayDownload));
+    this.#download.setAttribute("aria-label", mayDownload ? kDownload : kMayNotDownload);
+    this.#download.title = mayDownload ? kDownload : kMayNotDownload;
+  }
+
+  /** Of these cameras no recording can be downloaded from then on. */
+  deny(denied: ReadonlySet<number>): void {
+    this.#denied = denied;
+    this.refresh();
   }
 
   #name(button: HTMLButtonElement, what: string, event: Footage | null | undefined, key: string): void {

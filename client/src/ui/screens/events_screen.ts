@@ -174,11 +174,11 @@ export class EventsScreen extends Screen {
     this.#overview.cameras = list.camera ?? [];
     this.#stage.setCameras(this.#overview.cameras);
     this.#error = "";
-    // A host without a catalogue has no groups.
-    void this.#recordings.groups().then(
-      (groups) => this.#overview.filter.setGroups(groups),
-      () => undefined,
-    );
+    const ignore = () => undefined;
+    // A host without a catalogue has no groups; and whatever is offered, the server refuses what is denied.
+    void this.#recordings.groups().then((groups) => this.#overview.filter.setGroups(groups), ignore);
+    const deny = (denied: ReadonlySet<number>) => [this.#transport, this.#export].forEach((one) => one.deny(denied));
+    void this.#exports.denied().then(deny, ignore);
     this.#showLanes();
     await this.#openRoute();
   }

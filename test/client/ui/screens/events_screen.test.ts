@@ -173,6 +173,31 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await end.waitFor({ state: "hidden" });
   }, 40_000);
 
+  test("of a camera that may not be exported, recordings play, and neither download nor export is offered", async () => {
+    archive.notExported = [2];
+    const page = await events.open("#event=41", 1440, 900);
+    await state(page, "playing");
+    const link = page.locator("a[aria-label^='You may play the recordings of this camera']");
+    await link.waitFor();
+    expect(await link.getAttribute("href")).toBeNull();
+    await noFocus(page);
+    await page.keyboard.press("x");
+    const about = (text: string) => page.locator(".export-about", { hasText: text }).waitFor();
+    await about("Choose a camera.");
+    expect(await page.getByLabel("Parking (no export)").isDisabled()).toBe(true);
+    await page.locator(".export-panel .chip", { hasText: "Entrance" }).click();
+    await about("about 300 MB");
+    await page.keyboard.press("Escape");
+    archive.notExported = [1, 2];
+    await events.open("#event=11", 1440, 900).then(async (again) => {
+      await again.locator("a[aria-label^='You may play the recordings of this camera']").waitFor();
+      await noFocus(again);
+      await again.keyboard.press("x");
+      await again.locator(".export-about", { hasText: "You may play these recordings, but not export them." }).waitFor();
+    });
+    archive.notExported = [];
+  }, 40_000);
+
   test("a phone, too, says that there is nothing only once it knows", async () => {
     const page = await events.open("#events", 390, 844);
     const note = await page.waitForFunction(() => document.querySelector(".list-note")?.textContent);

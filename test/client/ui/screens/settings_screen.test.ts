@@ -253,8 +253,13 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.getByLabel("All cameras: Sound").click();
     await page.getByLabel("Entrance: Sound").click();
     await page.getByLabel("Group Outside: Live").click();
+    await page.getByLabel("Entrance: Playback").click();
+    expect(await page.getByLabel("Entrance: Export").getAttribute("title")).toBe("Denied with playback");
+    await page.getByLabel("Entrance: Playback").click();
+    expect(await page.getByLabel("Entrance: Export").getAttribute("title")).toBe("");
+    await page.getByLabel("Entrance: Export").click();
     await save(page);
-    const deny = { ...kNothingDenied, audio: [2], group: { ...kNothingDenied.group, live: [1] } };
+    const deny = { ...kNothingDenied, audio: [2], export: [1], group: { ...kNothingDenied.group, live: [1] } };
     await vi.waitFor(() => expect(setup.asked).toEqual([["user", { id: 2, revision: 1, deny }]]));
     await page.getByLabel("New password").fill("long enough");
     await page.getByLabel("Repeat password").fill("long enough");

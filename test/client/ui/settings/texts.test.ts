@@ -61,6 +61,8 @@ test("rights are summed up with those of groups, and only of cameras that there 
   const list = { camera: [1, 2, 3].map((id) => ({ id, name: `${id}` })), group: [{ id: 7, name: "g", camera: [2] }] };
   const deny = { ...kNothingDenied, audio: [1, 99], group: { ...kNothingDenied.group, live: [7] } };
   expect(rightsSummary(deny, list)).toBe("2 of 3 cameras, 1 of them without sound");
+  const unexported = { ...kNothingDenied, export: [1], playback: [2], group: { ...kNothingDenied.group, export: [] } };
+  expect(rightsSummary(unexported, list)).toBe("all cameras, 2 of them without export");
 });
 
 test("the audit log tells what differs, within settings as well", () => {

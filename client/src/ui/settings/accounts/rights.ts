@@ -3,6 +3,7 @@
 // Rights as they are edited and told: what an account is denied, in one order and in words.
 
 import {
+  byRight,
   kCameraRights,
   type CameraRight,
   type Denied,
@@ -11,20 +12,23 @@ import {
   type UserSettings,
 } from "../../../wire/accounts";
 
-export const kRightNames: Record<CameraRight, string> = { live: "Live", audio: "Sound", playback: "Playback" };
+export const kRightNames: Record<CameraRight, string> = {
+  live: "Live",
+  audio: "Sound",
+  playback: "Playback",
+  export: "Export",
+};
 export const kPrivilegeNames: Record<UserSettings["privilege"], string> = { viewer: "Viewer", manager: "Manager", owner: "Owner" };
 
 const inOrder = (ids: readonly number[]) => [...new Set(ids)].sort((one, other) => one - other);
 
 function eachRight(denied: Record<CameraRight, number[]>): Record<CameraRight, number[]> {
-  return { live: inOrder(denied.live), audio: inOrder(denied.audio), playback: inOrder(denied.playback) };
+  return byRight((right) => inOrder(denied[right]));
 }
 
 export const kNothingDenied: Denied = {
-  live: [],
-  audio: [],
-  playback: [],
-  group: { live: [], audio: [], playback: [] },
+  ...byRight(() => []),
+  group: byRight(() => []),
   emap: [],
   door: [],
   ioModule: [],
@@ -40,8 +44,9 @@ export function userSettingsOf({ privilege, mayMark, deny }: UserRecord): UserSe
   return { privilege, mayMark, deny: ordered(deny) };
 }
 
-/** Whether a camera's right is denied, by itself or with one of its groups. */
+/** Whether a camera's right is denied, by itself, with one of its groups or with the one that it takes. */
 export function isDenied(deny: Denied, right: CameraRight, camera: number, groups: UserList["group"]): boolean {
+  if (right === "export" && isDenied(deny, "playback", camera, groups)) return true;
   const ofGroup = groups.some((group) => group.camera.includes(camera) && deny.group[right].includes(group.id));
   return ofGroup || deny[right].includes(camera);
 }
@@ -63,12 +68,14 @@ export function rightsText(deny: Denied, { camera, group, emap, door, ioModule }
   return said.length === 0 ? "everything" : said.map(([text, denied]) => `${text}: ${denied.join(", ")}`).join("; ");
 }
 
-/** "5 of 6 cameras live, 2 without sound": of the cameras that there are. */
+/** "5 of 6 cameras, 2 of them without sound, without export": of the cameras that there are. */
 export function rightsSummary(deny: Denied, { camera, group }: Pick<UserList, "camera" | "group">): string {
   const seen = camera.filter(({ id }) => !isDenied(deny, "live", id, group));
-  const silent = seen.filter(({ id }) => isDenied(deny, "audio", id, group)).length;
   if (seen.length === 0) return "no camera";
   const live = seen.length === camera.length ? "all cameras" : `${seen.length} of ${camera.length} cameras`;
-  if (silent === 0) return live;
-  return `${live}, ${silent === seen.length ? "" : `${silent} of them `}without sound`;
+  const without = (right: CameraRight, name: string) => {
+    const count = seen.filter(({ id }) => isDenied(deny, right, id, group)).length;
+    return count === 0 ? "" : `, ${count === seen.length ? "" : `${count} of them `}without ${name}`;
+  };
+  return `${live}${without("audio", "sound")}${without("export", "export")}`;
 }

@@ -1,11 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What an account may do, as ticks: groups and cameras by live, sound and playback; doors, I/O modules and maps.
+// What an account may do, as ticks: groups and cameras by live, sound, playback, export; doors, I/O modules and maps.
 //
 // Why so        What is stored is what is denied, so that a new camera is seen by everyone who is not kept from it. A
-//               group that is denied covers its cameras: their own ticks stay as they are and are shown without effect.
+//               group that is denied covers its cameras: their own ticks stay as they are and are shown without effect;
+//               so is the one for export without the one for playback.
 
-import { kCameraRights, type CameraRight, type Denied, type UserList } from "../../../wire/accounts";
+import { byRight, kCameraRights, type CameraRight, type Denied, type UserList } from "../../../wire/accounts";
 import { element } from "../../widgets/dom";
 import { chipsField, type Field } from "../../widgets/fields";
 import { scrolled } from "../../widgets/table";
@@ -64,11 +65,8 @@ export class RightsMatrix implements Field<Denied> {
       const unticked = this.#rows.filter((row) => row.kind === kind && !row.boxes[right].checked);
       return [...unknown, ...unticked.map(({ id }) => id)];
     };
-    const rights = (kind: Row["kind"], known: readonly { id: number }[], before: Record<CameraRight, number[]>) => ({
-      live: denied(kind, "live", known, before.live),
-      audio: denied(kind, "audio", known, before.audio),
-      playback: denied(kind, "playback", known, before.playback),
-    });
+    const rights = (kind: Row["kind"], known: readonly { id: number }[], before: Record<CameraRight, number[]>) =>
+      byRight((right) => denied(kind, right, known, before[right]));
     const others = (name: OtherKind) => {
       const ticked = this.#others[name].value;
       const ids = this.#list[name].map(({ id }) => id);
@@ -96,8 +94,7 @@ export class RightsMatrix implements Field<Denied> {
   }
 
   #boxes(label: (right: CameraRight) => string): Record<CameraRight, HTMLInputElement> {
-    const box = (right: CameraRight) => element("input", { type: "checkbox", "aria-label": label(right), "data-right": right });
-    return { live: box("live"), audio: box("audio"), playback: box("playback") };
+    return byRight((right) => element("input", { type: "checkbox", "aria-label": label(right), "data-right": right }));
   }
 
   #cells(boxes: Row["boxes"]): HTMLElement[] {
@@ -128,12 +125,18 @@ export class RightsMatrix implements Field<Denied> {
       const ticked = cameras.filter(({ boxes }) => boxes[right].checked).length;
       this.#all[right].checked = ticked === cameras.length;
       this.#all[right].indeterminate = ticked > 0 && ticked < cameras.length;
-      for (const { id, boxes } of cameras) {
-        const groups = this.#list.group.filter(({ camera }) => camera.includes(id));
+      for (const { kind, id, boxes } of this.#rows) {
+        const groups = kind === "group" ? [] : this.#list.group.filter(({ camera }) => camera.includes(id));
         const denying = groups.find((group) => denied(right).includes(group.id));
         boxes[right].classList.toggle("is-covered", denying !== undefined);
         boxes[right].title = denying ? `Denied with the group ${denying.name}` : "";
       }
+    }
+    for (const { boxes } of this.#rows) {
+      const isPlayed = boxes.playback.checked && !boxes.playback.classList.contains("is-covered");
+      if (isPlayed || boxes.export.title) continue;
+      boxes.export.classList.add("is-covered");
+      boxes.export.title = "Denied with playback";
     }
   }
 }
