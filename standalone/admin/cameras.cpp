@@ -231,20 +231,28 @@ void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional
     }
 }
 
-void OrderCameras(store::Store& store, const Actor& actor, const std::vector<int>& ids) {
+Json::Value OrderRecord(const std::vector<Camera>& cameras) {
+    Json::Value json;
+    json["id"] = Json::arrayValue;
+    for (const Camera& camera : cameras) {
+        json["id"].append(camera.id);
+    }
+    json["revision"] = Json::Int64{RevisionOf(json)};
+    return json;
+}
+
+Json::Value OrderCameras(store::Store& store, const Actor& actor, std::optional<std::int64_t> seen,
+                         const std::vector<int>& ids) {
+    Json::Value record;
     Apply(store, actor, [&] {
-        const auto list = [](const auto& of, const auto& id_of) {
-            Json::Value json = Json::arrayValue;
-            for (const auto& each : of) {
-                json.append(id_of(each));
-            }
-            return json;
-        };
         store::Cameras cameras(store);
-        const Json::Value before = list(cameras.List(), [](const Camera& camera) { return camera.id; });
+        const Json::Value before = OrderRecord(cameras.List());
+        RequireCurrent(before, seen);
         cameras.SetOrder(ids);
-        return Change{"camera.order", "cameras", before, list(ids, [](int id) { return id; })};
+        record = OrderRecord(cameras.List());
+        return Change{"camera.order", "cameras", before["id"], record["id"]};
     });
+    return record;
 }
 
 }  // namespace lookhaven::admin

@@ -48,6 +48,7 @@ std::string List(const Call& call) {
     for (const store::Camera& camera : page.Cameras()) {
         page.Complete(data["camera"].append(admin::ToJson(admin::ReadCamera(records, camera.id))));
     }
+    data["order"] = admin::OrderRecord(page.Cameras());
     data["group"] = NamedList(store::Groups(records).List());
     data["mount"] = NamedList(store::Mounts(records).List(),
                               [](Json::Value& json, const store::Mount& mount) { json["default"] = mount.is_default; });
@@ -127,8 +128,9 @@ std::string Order(const Call& call) {
     for (const Json::Value& id : list) {
         ids.push_back(id.asInt());
     }
-    admin::OrderCameras(call.Records(), call.Actor(), ids);
-    return SuccessAnswer(Json::objectValue);
+    Json::Value data;
+    data["order"] = admin::OrderCameras(call.Records(), call.Actor(), SeenRevision(call), ids);
+    return SuccessAnswer(data);
 }
 
 using enum Method::Effect;

@@ -53,8 +53,10 @@ class CameraSetupTest(unittest.TestCase):
         wait_until(lambda: added["id"] in self.server.recording_cameras(), 10, "the schedule is obeyed")
         stale = self.ask("Set", id=added["id"], revision=added["revision"], name="Attic")
         self.assertEqual((stale["code"], stale["data"]["name"]), (409, "Barn"))
-        ids = [one["id"] for one in self.ask("List", footage=False)["camera"]]
-        self.ask("Order", id=ids[::-1])
+        order = self.ask("List", footage=False)["order"]
+        ids, seen = order["id"], order["revision"]
+        self.ask("Order", id=ids[::-1], revision=seen)
+        self.assertEqual(self.ask("Order", id=ids, revision=seen)["code"], 409, "somebody else was faster")
         self.assertEqual([one["id"] for one in self.ask("List")["camera"]], ids[::-1])
         files = f"recordings/{added['id']}/*/*.mkv"
         self.assertTrue(any(self.server.home.glob(files)))

@@ -51,6 +51,7 @@ def words(server):
         "$VIEWER_PASSWORD": PASSWORDS["viewer"].replace(" ", "+"),
         "$MOUNT_REVISION": str(mounts[0]["revision"]),
         "$SERVER_REVISION": str(hosts[1]["revision"]),
+        "$ORDER_REVISION": str(server.request(call("VEXO.Camera", "List"), "admin", {}).json["data"]["order"]["revision"]),
         "$REVISION": str(next(one["revision"] for one in accounts if one["name"] == "viewer")),
         "$EVENT": str(recorded_events(server, 1)[0]["id"]),
         "$FROM": str(now - 86400),

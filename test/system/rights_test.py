@@ -29,7 +29,7 @@ POST Camera.Probe address=rtsp://127.0.0.1:1/                         E      E  
 POST Camera.Add name=x source=[]                                      E      E     F       F     F    F       F        F        F      B       E
 POST Camera.Set id={camera} revision=1                                E      E     F       F     F    F       F        F        F      C/N     E
 POST Camera.Remove id={camera} revision=1 footage=keep                E      E     F       F     F    F       F        F        F      C/N     E
-POST Camera.Order id=[]                                               E      E     F       F     F    F       F        F        F      B       E
+POST Camera.Order id=[] revision=1                                    E      E     F       F     F    F       F        F        F      C       E
 Catalog.Groups: camera                                                E      E     D       O     D    D       D        D        D      D       E
 Catalog.CameraStates: camera                                          E      E     D       O     D    D       D        D        D      D       E
 Catalog.Mounts: camera                                                E      E     D       O     D    D       D        D        D      D       E

@@ -78,8 +78,15 @@ export interface CameraRecord extends CameraSettings {
   footage: { events: number; bytes: number; oldest: number | null } | null;
 }
 
+/** The ids of all cameras in their order. */
+export interface CameraOrder {
+  id: number[];
+  revision: number;
+}
+
 export interface CameraSetupList {
   camera: CameraRecord[];
+  order: CameraOrder;
   group: Named[];
   mount: (Named & { default: boolean })[];
   /** Common paths of RTSP addresses. */
@@ -153,9 +160,9 @@ export class CameraSetup {
     return this.#call("Remove", { id, revision, footage });
   }
 
-  /** Takes the ids of all cameras. */
-  order(id: number[]): Promise<unknown> {
-    return this.#call("Order", { id });
+  /** Takes the ids of all cameras. Rejects with status 409 and the order as it is where `revision` is stale. */
+  async order(id: number[], revision: number): Promise<CameraOrder> {
+    return (await this.#call<{ order: CameraOrder }>("Order", { id, revision })).order;
   }
 
   #call<Data>(method: string, json: unknown): Promise<Data> {

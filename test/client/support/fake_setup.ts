@@ -27,6 +27,8 @@ export const kCode = "008J-4CT4-ANK7-F24S-04HM-ASW9-NF6Y-Z93N";
 
 export class FakeSetup {
   readonly camera: CameraRecord[] = [];
+  /** What stands for the order of the cameras. */
+  orderRevision = 1;
   readonly user: UserRecord[] = [];
   /** The account that is logged in, and its sessions. */
   userId = 1;
@@ -55,11 +57,11 @@ export class FakeSetup {
   loss: unknown = null;
 
   readonly methods: Record<string, SetupMethod> = {
-    "VEXO.Camera.List": () => ok({ camera: this.camera, group: this.group, mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
+    "VEXO.Camera.List": () => ok({ camera: this.camera, order: this.#order(), group: this.group, mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
     "VEXO.Camera.Probe": () => ok(this.probe),
     "VEXO.Camera.Add": (request) => this.#note("Camera.Add", request, ok({ camera: { revision: 1, ...request } })),
     "VEXO.Camera.Set": (request) => this.#set("camera", request),
-    "VEXO.Camera.Order": (request) => this.#note("Camera.Order", request, ok({})),
+    "VEXO.Camera.Order": (request) => this.#setOrder(request),
     "VEXO.User.List": () => ok({ user: this.user, camera: this.camera, group: [{ id: 1, name: "Outside", camera: [2] }], door: [], ioModule: [], emap: [] }),
     "VEXO.User.Set": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : this.#set("user", request)),
     "VEXO.User.Sessions": () => ok({ session: this.session }),
@@ -112,6 +114,19 @@ export class FakeSetup {
     const merged = { ...this.preferences.get(id), ...preferences };
     this.preferences.set(id, merged);
     return ok({ preferences: merged });
+  }
+
+  #order() {
+    return { id: this.camera.map(({ id }) => id), revision: this.orderRevision };
+  }
+
+  #setOrder(request: Request): Answer {
+    const { id, revision } = request as unknown as { id: number[]; revision: number };
+    if (revision !== this.orderRevision) return failed(409, "It was changed meanwhile.", this.#order());
+    this.orderRevision += 1;
+    this.camera.sort((one, other) => id.indexOf(one.id) - id.indexOf(other.id));
+    this.camera.forEach((camera, at) => (camera.order = at + 1));
+    return this.#note("Camera.Order", request, ok({ order: this.#order() }));
   }
 
   #addHost(request: Request): Answer {

@@ -126,6 +126,30 @@ TEST_P(CameraChangeTest, SomebodyElsesChangeIsNotOverwritten) {
     EXPECT_EQ(ReadCamera(store_, id).camera.name, "Yard");
 }
 
+TEST_P(CameraChangeTest, AnOrderIsChangedByWhoHasSeenIt) {
+    const std::vector<int> ids = {AddGate(), AddGate()};
+    const auto order = [this] { return OrderRecord(store::Cameras(store_).List()); };
+    const Json::Value first = order();
+    const auto is_stale = [&](const Json::Value& seen) {
+        try {
+            OrderCameras(store_, {}, seen["revision"].asInt64(), {ids[1], ids[0]});
+        } catch (const Stale& stale) {
+            return stale.Record() == order() && LastChange().action != "camera.order";
+        }
+        return false;
+    };
+    Set(ids[0], [](CameraSetup& setup) { setup.camera.name = "Yard"; });
+    EXPECT_EQ(order(), first) << "a camera is no part of it";
+    const Json::Value second = OrderCameras(store_, {}, first["revision"].asInt64(), {ids[1], ids[0]});
+    EXPECT_EQ(order(), second);
+    EXPECT_EQ(OrderCameras(store_, {}, second["revision"].asInt64(), ids), first);
+    const int added = AddGate();
+    EXPECT_TRUE(is_stale(first)) << "a camera came";
+    RemoveCamera(store_, {}, added, {}, Footage::kKeep);
+    EXPECT_TRUE(is_stale(second));
+    EXPECT_FALSE(is_stale(first)) << "it is that order again";
+}
+
 TEST_P(CameraChangeTest, TheLogTellsWhatChangedButNoPassword) {
     const int group = store::Groups(store_).Add({.name = "Yard", .camera_ids = {}});
     const int id = AddGate();
@@ -138,10 +162,10 @@ TEST_P(CameraChangeTest, TheLogTellsWhatChangedButNoPassword) {
     EXPECT_EQ(store::Cameras(store_).FindCredentials(id)->password, "other-s3cret");
     Set(id, [](CameraSetup& setup) { setup.groups.clear(), setup.credentials.reset(); });
     EXPECT_TRUE(store::Groups(store_).Find(group)->camera_ids.empty());
-    OrderCameras(store_, {}, {AddGate(), id});
+    OrderCameras(store_, {}, {}, {AddGate(), id});
     EXPECT_EQ(LastChange().after, "[2,1]");
     EXPECT_EQ(store::Cameras(store_).List().front().id, 2);
-    EXPECT_THROW(OrderCameras(store_, {}, {2}), store::InvalidRecord);
+    EXPECT_THROW(OrderCameras(store_, {}, {}, {2}), store::InvalidRecord);
     for (const store::AuditEntry& entry : store::AuditLog(store_).List(0, 9)) {
         EXPECT_THAT(entry.before + entry.after, Not(HasSubstr("s3cret"))) << entry.action;
     }
@@ -214,7 +238,7 @@ TEST_P(CameraChangeTest, IsForManagersHereToo) {
         [&] { admin::AddCamera(store_, viewer, kinds_, Gate()); },
         [&] { SetCamera(store_, viewer, kinds_, id, {}, [](CameraSetup&) { FAIL() << "nothing is looked at"; }); },
         [&] { RemoveCamera(store_, viewer, id, {}, Footage::kRemove); },
-        [&] { OrderCameras(store_, viewer, {id}); },
+        [&] { OrderCameras(store_, viewer, {}, {id}); },
     };
     for (const auto& change : changes) {
         EXPECT_THROW(change(), Forbidden);

@@ -73,6 +73,10 @@ export class CameraRow {
     return this.#camera.id;
   }
 
+  get name(): string {
+    return this.#camera.name;
+  }
+
   show(camera: CameraRecord, groups: readonly Named[]): void {
     this.#camera = camera;
     const { name, state, codec, rate, bytes, footage } = camera;

@@ -2,7 +2,7 @@
 //
 // All cameras with their pictures and states, in the order that everyone gets them.
 
-import { CameraSetup, type CameraSetupList } from "../../../wire/camera_setup";
+import { CameraSetup, type CameraOrder, type CameraSetupList } from "../../../wire/camera_setup";
 import { Semaphore } from "../../../wire/semaphore";
 import { asServerError } from "../../../wire/server";
 import { settingsAddress } from "../../screens/route";
@@ -10,6 +10,7 @@ import { linkButton } from "../../widgets/button";
 import { element, setText } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";
 import { orderHandle } from "../../widgets/order_list";
+import { conflictPanel } from "../conflict_panel";
 import { emptyState, LoadedPage, type PageContext } from "../page";
 import { CameraRow } from "./camera_row";
 
@@ -24,9 +25,14 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
   readonly #count = element("p", { class: "quiet settings-count" });
   readonly #list = element("ol", { class: "settings-list cameras-list" });
   readonly #pictures = new Semaphore(kPicturesAtOnce);
+  readonly #conflict = element("div", { class: "form-conflict-place" });
   #rows: CameraRow[] = [];
+  /** As the server had it last. */
+  #order: CameraOrder = { id: [], revision: 0 };
   /** Until this is null, the server's own order is an older one. */
   #ordering: ReturnType<typeof setTimeout> | null = null;
+  /** Orders are stored one after the other: each goes by the revision that the one before has led to. */
+  #storing = Promise.resolve();
 
   constructor(context: PageContext) {
     const groups = linkButton("Groups", settingsAddress("groups"));
@@ -44,11 +50,16 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
 
   override close(): void {
     super.close();
-    if (this.#ordering) void this.#storeOrder();
+    if (this.#ordering) this.#storeOrder();
   }
 
-  #showList({ camera, group }: CameraSetupList): void {
-    if (this.#ordering || this.#list.querySelector(".is-dragged")) return;
+  override get isChanged(): boolean {
+    return this.#conflict.childElementCount > 0;
+  }
+
+  #showList({ camera, group, order }: CameraSetupList): void {
+    if (this.#ordering || this.isChanged || this.#list.querySelector(".is-dragged")) return;
+    this.#order = order;
     if (camera.length === 0) {
       this.#rows = [];
       const add = linkButton("Add the first camera", settingsAddress("cameras", "new"), true);
@@ -60,7 +71,7 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
     const rows = inOrder.map((one) => {
       const row = this.#rows.find(({ id }) => id === one.id) ?? new CameraRow(this.context.server, one, group);
       if (!this.#rows.includes(row)) {
-        row.root.prepend(orderHandle(this.#list, row.root, one.name, () => this.#order()));
+        row.root.prepend(orderHandle(this.#list, row.root, one.name, () => this.#orderSoon()));
         added.push(row);
       }
       row.show(one, group);
@@ -73,7 +84,7 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
     }
     const live = camera.filter(({ state }) => state === "running").length;
     setText(this.#count, `${live} of ${camera.length} live. Drag the handles to change the order of the wall.`);
-    if (!this.#list.isConnected) this.show(this.#count, this.#list);
+    if (!this.#list.isConnected) this.show(this.#count, this.#conflict, this.#list);
     this.#loadPictures(added);
   }
 
@@ -82,20 +93,51 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
     for (const row of rows) void this.#pictures.run(this.closed, () => row.loadPicture(this.closed)).catch(() => undefined);
   }
 
-  #order(): void {
+  #orderSoon(): void {
     if (this.#ordering) clearTimeout(this.#ordering);
-    this.#ordering = setTimeout(() => void this.#storeOrder(), kOrderDelayMs);
+    this.#ordering = setTimeout(() => this.#storeOrder(), kOrderDelayMs);
   }
 
-  async #storeOrder(): Promise<void> {
+  #storeOrder(): void {
     const moved = this.#ordering;
     if (moved) clearTimeout(moved);
-    try {
-      await this.#setup.order([...this.#list.children].map((child) => Number((child as HTMLElement).dataset.camera)));
-    } catch (error) {
-      notify(`The order is not saved. ${asServerError(error).message}`);
-    } finally {
+    this.#storing = this.#storing.then(async () => {
+      await this.#sendOrder([...this.#list.children].map((child) => Number((child as HTMLElement).dataset.camera)));
       if (this.#ordering === moved) this.#ordering = null;
+    });
+  }
+
+  async #sendOrder(wanted: number[]): Promise<void> {
+    try {
+      this.#order = await this.#setup.order(wanted, this.#order.revision);
+      this.#conflict.replaceChildren();
+    } catch (error) {
+      const { status, data, message } = asServerError(error);
+      if (status === 409 && !this.closed.aborted) this.#showConflict(wanted, data as CameraOrder);
+      else notify(`The order is not saved. ${message}`);
     }
+  }
+
+  /** What the server has is shown once the user has chosen. */
+  #showConflict(mine: number[], theirs: CameraOrder): void {
+    const names = new Map(this.#rows.map((row) => [row.id, row.name]));
+    const text = (ids: number[]) => ids.map((id) => names.get(id) ?? "a new camera").join(", ");
+    const keepMine = () => {
+      this.#order = theirs;
+      const added = theirs.id.filter((id) => !mine.includes(id));
+      void this.#sendOrder([...mine.filter((id) => theirs.id.includes(id)), ...added]).then(() => this.#reload());
+    };
+    const takeTheirs = () => {
+      this.#conflict.replaceChildren();
+      void this.#reload();
+    };
+    const [base, own, now] = [{ order: this.#order.id }, { order: mine }, { order: theirs.id }];
+    const panel = conflictPanel("order of cameras", base, own, now, { order: ["Order", text] }, { keepMine, takeTheirs });
+    this.#conflict.replaceChildren(panel);
+  }
+
+  async #reload(): Promise<void> {
+    const list = await this.#setup.list({ footage: false }).catch((error: unknown) => void notify(asServerError(error).message));
+    if (list && !this.closed.aborted) this.#showList(list);
   }
 }
