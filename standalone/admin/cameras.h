@@ -58,7 +58,8 @@ enum class Footage { kKeep, kRemove };
 // writing. What is unfinished then, or left when this is interrupted or throws, the recorder's maintenance removes.
 void RemoveCamera(store::Store& store, const Actor& actor, int id, std::optional<std::int64_t> seen, Footage footage);
 
-// {"id": […], "revision"} of cameras in their order. The revision changes with it, and with a camera that comes or goes.
+// {"id": […], "revision"} of cameras in their order. The revision changes with it, and with a camera that comes or
+// goes.
 Json::Value OrderRecord(const std::vector<store::Camera>& cameras);
 // ids: all cameras, each once. Returns the record of their order, which Stale has as it is.
 Json::Value OrderCameras(store::Store& store, const Actor& actor, std::optional<std::int64_t> seen,

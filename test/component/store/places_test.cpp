@@ -152,6 +152,18 @@ TEST_P(PlaceTest, WhatIsDeniedOfAGroupIsDeniedOfItsCameras) {
     EXPECT_THROW(groups_.Remove(yard), NotFound);
 }
 
+TEST_P(PlaceTest, WhatMayNotBePlayedIsNotExportedEither) {
+    const int id = users_.Add("bob", "correct horse", Privilege::kViewer).id;
+    users_.Deny(id, 2);
+    users_.Allow(id, 2, {CameraAccess::kPlayback});
+    users_.Deny(id, 6, {CameraAccess::kExport});
+    users_.Deny(id, 7, {CameraAccess::kPlayback});
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kExport), ElementsAre(2, 6, 7));
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kPlayback), ElementsAre(7));
+    users_.Allow(id, 7, {CameraAccess::kPlayback});
+    EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kExport), ElementsAre(2, 6));
+}
+
 TEST_P(PlaceTest, GroupsKeepCamerasThatWereRemovedAndTakeNoUnknownOnes) {
     AddCamera();
     AddCamera();
