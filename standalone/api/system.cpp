@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // VEXO.System: how the installation is, for monitors, who find it at /healthz and /metrics; and for managers its parts
-// with what to do where one is not well, what was changed in it, and what holds for all of it.
+// with what to do where one is not well, its last errors, what was changed in it, and what holds for all of it.
 #include <algorithm>
 #include <array>
 #include <limits>
@@ -23,6 +23,7 @@
 #include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/base/text.h"
+#include "standalone/doctor/error_log.h"
 #include "standalone/store/audit_log.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/settings.h"
@@ -32,6 +33,7 @@ namespace lookhaven::api {
 namespace {
 
 constexpr std::int64_t kMaxAuditEntries = 200;
+constexpr std::int64_t kMaxErrors = 200;
 constexpr int kMonitorUserId = -1;  // all monitors together
 constexpr int kStatusUserId = -2;   // all who look at the state
 constexpr const char* kNoMonitor =
@@ -145,6 +147,27 @@ std::string Status(const Call& call) {
     return SuccessAnswer(SystemStatus(call));
 }
 
+std::string LogTail(const Call& call) {
+    admin::RequireManager(call.Records(), call.Actor());
+    const std::int64_t limit = call.NumberOr("limit", kMaxErrors);
+    if (limit < 1 || limit > kMaxErrors) {
+        throw Failure(400, "limit must be 1 to 200");
+    }
+    const doctor::LastErrors last =
+        doctor::ReadLastErrors(call.context.Installation().LogFolder(), static_cast<std::size_t>(limit));
+    Json::Value data;
+    Json::Value& list = data["entry"] = Json::arrayValue;
+    for (const doctor::LoggedError& error : last.newest_first) {
+        Json::Value& json = list.append(Json::objectValue);
+        json["time"] = Json::Int64{error.time_ms / 1000};
+        json["process"] = error.process;
+        json["text"] = error.text;
+    }
+    data["files"] = last.has_files;
+    data["journal"] = base::LogsToJournal();
+    return SuccessAnswer(data);
+}
+
 std::string Settings(const Call& call) {
     admin::RequireManager(call.Records(), call.Actor());
     Json::Value data;
@@ -172,6 +195,7 @@ constexpr Method kMethods[] = {{"Health", Health},
                                {"Settings", Settings, kChanges, kManagers},
                                {"SetSetting", SetSetting, kChanges, kManagers},
                                {"SetCertificate", SetCertificate, kChanges, kManagers},
+                               {"LogTail", LogTail, kChanges, kManagers},
                                {"LogLevels", LogLevels, kChanges, kManagers},
                                {"SetLogLevels", SetLogLevels, kChanges, kManagers}};
 

@@ -4,8 +4,10 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
+#include <cstdlib>
 #include <string>
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
@@ -49,6 +51,13 @@ void Log(Severity severity, std::string_view text) noexcept try {
     // A log that cannot be written has nobody to tell.
     [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
 } catch (...) {
+}
+
+bool LogsToJournal() {
+    const char* stream = std::getenv("JOURNAL_STREAM");  // "device:inode"; a child may have another standard error
+    struct stat status {};
+    return stream != nullptr && ::fstat(STDERR_FILENO, &status) == 0 &&
+           stream == std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
 }
 
 }  // namespace lookhaven::base

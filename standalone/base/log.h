@@ -20,6 +20,9 @@ void SetLogThreshold(Severity threshold);
 // Thread safety: any thread, and a forked child too.
 void Log(Severity severity, std::string_view text) noexcept;
 
+// Whether standard error is the journal of systemd, which no file of ours holds.
+bool LogsToJournal();
+
 inline void LogError(std::string_view text) noexcept {
     Log(Severity::kError, text);
 }

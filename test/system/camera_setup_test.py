@@ -69,6 +69,7 @@ class CameraSetupTest(unittest.TestCase):
         first = (log[-1]["who"], log[-1]["address"], log[-1]["object"])
         self.assertEqual(first, ("admin", "127.0.0.1", f"Shed ({added['id']})"))
         self.assertNotIn("s3cret", json.dumps(log))
+        self.assertNotIn("s3cret", json.dumps(self.ask("LogTail", "VEXO.System")))
         self.assertIn("admin at 127.0.0.1", self.server.cli("audit"))
 
     def test_what_a_camera_sends_is_decoded_and_what_it_does_not_is_said(self):

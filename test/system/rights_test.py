@@ -92,6 +92,7 @@ POST System.Audit                                                     E      E  
 POST System.Settings                                                  E      E     F       F     F    F       F        F        F      D       E
 POST System.SetSetting name=cms value=x revision=1                    E      E     F       F     F    F       F        F        F      B       E
 POST System.SetCertificate certificate=x key=x reauth=own             E      E     F       F     F    F       F        F        F      B       E
+POST System.LogTail                                                   E      E     F       F     F    F       F        F        F      D       E
 POST System.LogLevels                                                 E      E     F       F     F    F       F        F        F      D       E
 POST System.SetLogLevels revision=1 others=debug                      E      E     F       F     F    F       F        F        F      C       E
 POST Mount.List                                                       E      E     F       F     F    F       F        F        F      D       E

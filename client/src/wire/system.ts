@@ -62,6 +62,21 @@ export interface LogLevels {
   revision: number;
 }
 
+/** Errors that the server has logged, the newest first. */
+export interface LogTail {
+  entry: {
+    /** Unix seconds. */
+    time: number;
+    /** Whose: "recorder". */
+    process: string;
+    text: string;
+  }[];
+  /** There are log files. */
+  files: boolean;
+  /** The programs log to the journal of the system, which is not told. */
+  journal: boolean;
+}
+
 export interface SystemStatus {
   version: string;
   store: { engine: string; schema: number };
@@ -122,6 +137,11 @@ export class System {
   async setCertificate(offer: CertificateOffer, reauth: string): Promise<{ reloaded: boolean }> {
     const options = { json: { ...offer, confirm: true, reauth }, timeoutMs: kReloadTimeoutMs };
     return (await this.#server.call<{ certificate: { reloaded: boolean } }>(kApi, "SetCertificate", {}, options)).certificate;
+  }
+
+  /** `limit`: 200 at most. */
+  logTail(limit: number): Promise<LogTail> {
+    return this.#server.call(kApi, "LogTail", {}, { json: { limit } });
   }
 
   async logLevels(): Promise<LogLevels> {

@@ -9,7 +9,7 @@ import type { GroupRecord } from "../../../client/src/wire/groups";
 import type { HostLoss, HostRecord } from "../../../client/src/wire/hosts";
 import type { MountRecord } from "../../../client/src/wire/mounts";
 import type { OpenSession, UserRecord } from "../../../client/src/wire/accounts";
-import type { LogLevels, OfferedCertificate, SettingRecord, SystemStatus } from "../../../client/src/wire/system";
+import type { LogLevels, LogTail, OfferedCertificate, SettingRecord, SystemStatus } from "../../../client/src/wire/system";
 
 type Request = Record<string, never> & { id: number };
 type Answer = { status: number; success: boolean; data?: unknown; error?: unknown };
@@ -51,6 +51,7 @@ export class FakeSetup {
   /** What is found in the files of a certificate; null where they are no pair. */
   offered: OfferedCertificate | null = null;
   log: LogLevels = { category: [], others: "error", known: ["debug", "error", "off"], revision: 1 };
+  tail: LogTail = { entry: [], files: true, journal: false };
   /** The answer of a probe. */
   probe: unknown = null;
   /** What a new limit deletes. */
@@ -87,6 +88,7 @@ export class FakeSetup {
     "VEXO.System.Status": () => ok(this.status),
     "VEXO.System.Settings": () => ok({ setting: this.setting }),
     "VEXO.System.SetCertificate": (request) => this.#setCertificate(request),
+    "VEXO.System.LogTail": ({ limit }) => ok({ ...this.tail, entry: this.tail.entry.slice(0, Number(limit)) }),
     "VEXO.System.LogLevels": () => ok({ log: this.log }),
     "VEXO.System.SetLogLevels": (request) => this.#setLog(request),
     "VEXO.System.SetSetting": (request) => this.#setSetting(request),

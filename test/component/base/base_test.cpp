@@ -15,6 +15,7 @@
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -173,6 +174,19 @@ TEST(LogTest, ALineSteersNoTerminal) {
                   "2J\xc3\x9b\xc2\xa0\xc2");
     const std::string line = testing::internal::GetCapturedStderr();
     EXPECT_TRUE(line.ends_with(" info: a b [2J  2J\xc3\x9b\xc2\xa0\xc2\n")) << line;
+}
+
+TEST(LogTest, TheJournalIsKnownByStandardErrorItself) {
+    struct stat status {};
+    ASSERT_EQ(::fstat(STDERR_FILENO, &status), 0);
+    const std::string own = std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
+    ::unsetenv("JOURNAL_STREAM");
+    EXPECT_FALSE(LogsToJournal());
+    for (const auto& [stream, is_journal] : {std::pair{own, true}, {own + "1", false}, {std::string(), false}}) {
+        ::setenv("JOURNAL_STREAM", stream.c_str(), 1);
+        EXPECT_EQ(LogsToJournal(), is_journal) << stream;
+    }
+    ::unsetenv("JOURNAL_STREAM");
 }
 
 TEST(ClockTest, DatesAreUtcWithMilliseconds) {

@@ -102,6 +102,35 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await vi.waitFor(async () => expect(await side.inputValue()).toBe("8"));
   }, 30_000);
 
+  test("the last errors are shown, more on demand; where there are none, the page says why, and where to look", async () => {
+    const store = { engine: "sqlite", schema: 7 };
+    setup.status = { version: "1.2.3", store, process: [], certificate: null, check: [] };
+    const entry = Array.from({ length: 12 }, (_, at) => ({ time: 1_790_000_000 - at, process: "recorder", text: `Gate <b>${at}</b> fails` }));
+    setup.tail = { entry, files: true, journal: false };
+    const page = await open("system");
+    const panel = page.locator(".form-part", { hasText: "Last errors" }).last();
+    await panel.getByText("Gate <b>9</b> fails").waitFor();
+    expect(await panel.locator("tbody tr").count()).toBe(10);
+    await panel.getByRole("button", { name: "Show up to 200" }).click();
+    await panel.getByText("Gate <b>11</b> fails").waitFor();
+    expect(await panel.getByRole("button", { name: "Show up to 200" }).count()).toBe(0);
+    const again = () => page.getByRole("button", { name: "Check again" }).click();
+    for (const [files, journal, told] of [[true, false, "No errors in the log files"], [false, false, "has no log files"], [false, true, "journal of the system"]] as const) {
+      setup.tail = { entry: [], files, journal };
+      await again();
+      await panel.getByText(told).waitFor();
+    }
+    expect(await panel.getByText("No errors").count() + (await panel.getByText("no log files").count())).toBe(0);
+    await panel.getByRole("button", { name: /^Copy journalctl/ }).waitFor();
+    client.server.isAway = true;
+    await again();
+    await panel.getByRole("alert").waitFor();
+    client.server.isAway = false;
+    await panel.getByRole("button", { name: "Try again" }).click();
+    await panel.getByText("journal of the system").waitFor();
+    setup.tail = { entry: [], files: true, journal: false };
+  }, 30_000);
+
   test("a certificate is replaced once its files are checked and its price is told; log levels are set, nobody's lost", async () => {
     const certificate = { subject: "CN=nvr", name: ["nvr"], fingerprint: "AB:CD", end: 1_790_000_000, selfSigned: true };
     const store = { engine: "sqlite", schema: 7 };

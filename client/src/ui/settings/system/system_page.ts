@@ -16,6 +16,7 @@ import { changedFrom } from "../merge";
 import { LoadedPage, type PageContext } from "../page";
 import { RecordForm } from "../record_form";
 import { copyable } from "./copyable";
+import { ErrorPanel } from "./error_panel";
 import { HealthPanel } from "./health_panel";
 import { LogPanel } from "./log_panel";
 import { SettingFields, settingLabel, type Values } from "./setting_fields";
@@ -33,23 +34,30 @@ const valuesOf = ({ settings }: Stored): Values =>
 export class SystemPage extends LoadedPage<SettingRecord[]> {
   readonly #system: System;
   readonly #health: HealthPanel;
+  readonly #errors: ErrorPanel;
   readonly #log: LogPanel;
   #form: RecordForm<Values, Stored> | null = null;
 
   constructor(context: PageContext) {
-    const again = button("Check again", (pressed) => void whileBusy(pressed, this.#health.load()));
+    const again = button("Check again", (pressed) => void whileBusy(pressed, this.#checkAgain()));
     super(context, "System", again);
     this.#system = new System(context.server);
     this.#health = new HealthPanel(this.#system, this.closed);
+    this.#errors = new ErrorPanel(this.#system, this.closed);
     this.#log = new LogPanel(this.#system, this.closed);
     void this.start(
       () => this.#system.settings(),
       (settings) => {
         this.#showAll(settings, context.draft);
         void whileBusy(again, this.#health.load());
+        void this.#errors.load();
         void this.#log.load();
       },
     );
+  }
+
+  async #checkAgain(): Promise<void> {
+    await Promise.all([this.#health.load(), this.#errors.load()]);
   }
 
   override get isChanged(): boolean {
@@ -80,7 +88,7 @@ export class SystemPage extends LoadedPage<SettingRecord[]> {
     this.#form = form;
     const operators = formPart("On the server only", ...all.filter(({ operator }) => operator).map(operatorsSetting));
     const audit = linkButton("Audit log", settingsAddress("audit"));
-    this.show(this.#health.root, form.root, operators, this.#log.root, formPart("Who changed what", audit));
+    this.show(this.#health.root, form.root, operators, this.#errors.root, this.#log.root, formPart("Who changed what", audit));
   }
 
   /** What was typed is given up. */
