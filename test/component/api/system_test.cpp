@@ -85,7 +85,8 @@ TEST_F(SystemApi, ManagersAreToldOfEachPartAndWhatToDo) {
     control::CommonConfigKeeper(host_.Home()).Refresh(false);
     const Json::Value after = Status();
     EXPECT_EQ(after["process"][0]["state"], "running");
-    EXPECT_NEAR(static_cast<double>(after["process"][0]["since"].asInt64()), static_cast<double>(base::WallSeconds()), 120)
+    EXPECT_NEAR(static_cast<double>(after["process"][0]["since"].asInt64()), static_cast<double>(base::WallSeconds()),
+                120)
         << "this process stands for the recorder";
     const Json::Value certificate = after["certificate"];
     EXPECT_EQ(certificate["subject"], "CN=nvr,O=Ünder Test");
