@@ -19,7 +19,7 @@ constexpr std::int64_t kMaxWrittenAgeUs = 5'000'000;
 
 struct Problem {
     std::string subject;  // "recorder", "camera", "mount" or "store"
-    int id = 0;        // of the camera or mount
+    int id = 0;           // of the camera or mount
     std::string message;
 };
 

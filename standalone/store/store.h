@@ -27,7 +27,8 @@ class StoreError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// The database server cannot be reached, or the connection to it was lost: what fails for that alone may be tried again.
+// The database server cannot be reached, or the connection to it was lost: what fails for that alone may be tried
+// again.
 class StoreUnavailable : public StoreError {
   public:
     using StoreError::StoreError;
