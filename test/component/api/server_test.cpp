@@ -111,7 +111,7 @@ TEST_F(ServerApi, SaysWhatIsWrongWithACodeOrAnAddressAndNoMoreThanThat) {
         EXPECT_EQ(answer.status, row.status) << row.body;
         EXPECT_THAT(answer.body, HasSubstr(row.says)) << row.body;
     }
-    EXPECT_EQ(Ask("Pair&code=" + code, "name=x&address=127.0.0.1&port=1").status, 400);
+    EXPECT_EQ(Ask("Add&code=" + code, "name=x&address=127.0.0.1&port=1").status, 400);
     EXPECT_EQ(Ask("Add", away + code).body, Ask("Add", nowhere + code).body) << "whatever the address is";
     EXPECT_TRUE(store::RecordingServers(store_).List().empty());
 }

@@ -76,10 +76,10 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     for (const text of ["1.2.3", "SQLite, schema 7", "AB:CD", "CN=nvr", "OK: folder."]) await page.getByText(text).waitFor();
     client.server.isAway = true;
     await page.getByRole("button", { name: "Check again" }).click();
-    await page.getByRole("alert").getByText("does not answer").waitFor();
+    await page.getByRole("alert").getByText("does not answer").first().waitFor();
     client.server.isAway = false;
     setup.status.check = [folder];
-    await page.getByRole("button", { name: "Try again" }).click();
+    await page.getByRole("button", { name: "Try again" }).first().click();
     await page.getByText("All is well.").waitFor();
     const side = page.getByLabel("Recordings side by side");
     for (const [typed, told] of [["17", "from 1 to 16"], ["2.5", "whole number"], ["9", "The settings are saved."]] as const) {
