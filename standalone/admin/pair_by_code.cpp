@@ -101,8 +101,9 @@ PairingOutcome PairByCode(const Records& records, const Actor& actor, store::Rec
     }
     records.close();
     const Offer offer = Accept(server, code);
-    return {AddServer(records.open(), actor, server, offer.secret, offer.cameras, true), offer.secret,
-            offer.cameras.size()};
+    return {AddServer(records.open(), actor, server, offer.secret, offer.cameras,
+                      {.shows_cameras = true, .confirmed = confirmed}),
+            offer.secret, offer.cameras.size()};
 }
 
 }  // namespace lookhaven::admin

@@ -85,16 +85,19 @@ NewPairing AdmitServer(store::Store& store, const Actor& actor, const std::strin
 }
 
 RecordingServer AddServer(store::Store& store, const Actor& actor, RecordingServer server, const std::string& secret,
-                          const std::vector<store::RemoteCamera>& cameras, bool shows_cameras) {
+                          const std::vector<store::RemoteCamera>& cameras, AddingOptions options) {
     store::InTransaction(store, [&] {
         Apply(store, actor, [&] {
+            if (!options.confirmed) {
+                RequireSameServer(store, server);
+            }
             const Json::Value before = AuditedByName(store, server.name);
             server.id = RecordingServers(store).Pair(server, secret, cameras);
             Change change = Paired("server.add", server, before);
             change.after["cameras"] = static_cast<Json::UInt64>(cameras.size());
             return change;
         });
-        if (shows_cameras) {
+        if (options.shows_cameras) {
             SetSetting(store, actor, kCentralManagement, {}, true);
         }
     });

@@ -36,12 +36,17 @@ struct NewPairing {
 // Throws store::AlreadyExists where the name is that of a host whose cameras this one shows.
 NewPairing AdmitServer(store::Store& store, const Actor& actor, const std::string& name);
 
-// Adds a host whose cameras are to be shown, or renews its pairing; server.id is ignored. shows_cameras: also sets
-// kCentralManagement, as SetSetting does. Returns the record as it is then. Throws
-// store::AlreadyExists where the name is that of a host that shows this one's cameras.
+struct AddingOptions {
+    bool shows_cameras = false;  // also sets kCentralManagement, as SetSetting does
+    bool confirmed = false;      // whatever users are denied of a host of that name
+};
+
+// Adds a host whose cameras are to be shown, or renews its pairing; server.id is ignored. Returns the record as it is
+// then. Throws MovesDenials as RequireSameServer does, unless confirmed; store::AlreadyExists where the name is that of
+// a host that shows this one's cameras.
 store::RecordingServer AddServer(store::Store& store, const Actor& actor, store::RecordingServer server,
                                  const std::string& secret, const std::vector<store::RemoteCamera>& cameras,
-                                 bool shows_cameras);
+                                 AddingOptions options);
 
 // Makes known the cameras that the server has now, as RecordingServers::PutCameras does. Returns how many are new here.
 int PutServerCameras(store::Store& store, const Actor& actor, int id, const std::vector<store::RemoteCamera>& cameras);
@@ -67,7 +72,7 @@ ServerLoss LossOf(store::Store& store, int id);
 class RemovesDenials : public std::runtime_error {
   public:
     explicit RemovesDenials(ServerLoss loss)
-        : std::runtime_error("removing this server also removes what users are denied of it"),
+        : std::runtime_error("removing this host also removes what users are denied of it"),
           loss_(std::move(loss)) {}
     const ServerLoss& Loss() const { return loss_; }
 
@@ -89,7 +94,7 @@ class MovesDenials : public std::runtime_error {
     ServerLoss loss_;
 };
 
-// Before AddServer, where nobody has confirmed it. Throws MovesDenials.
+// What AddServer refuses, where it is to be known earlier. Throws MovesDenials.
 void RequireSameServer(store::Store& store, const store::RecordingServer& server);
 
 // Ends the pairing, and returns what went with it. seen: the record's revision that the actor saw; nothing for whatever

@@ -76,8 +76,8 @@ CostClass CostClassOf(const Call& call) {
     if (counts_footage || reads_all || waits_for_host) {
         return CostClass::kSearch;
     }
-    const bool is_preference = call.api == kUserApi.name && call.method.ends_with("Preferences");
-    const bool is_light = is_preference || call.api == kAuthApi.name || call.api == kPlaybackApi.name ||
+    const bool reads_preferences = call.api == kUserApi.name && call.method == "Preferences";
+    const bool is_light = reads_preferences || call.api == kAuthApi.name || call.api == kPlaybackApi.name ||
                           call.api == kRelayApi.name || call.api == kServerApi.name || call.api == kSystemApi.name ||
                           call.api == kCameraApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;

@@ -36,12 +36,22 @@ Json::Value IdsOf(const Records& cameras) {
 
 std::string Groups(const Call& call) {
     const std::set<int> denied = PrivProfileGetByUid(call.context.Caller()).GetInaPrivPerCamGrpIdSet(CAM_PRIV_PLAYBACK);
+    const std::set<int> unwatchable = binding::DeniedCameras(store::CameraAccess::kLive);
     Json::Value data;
     Json::Value& list = data["group"] = Json::arrayValue;
     for (const store::CameraGroup& group : store::Groups(call.Records()).List()) {
         CamGroup cameras;
-        if (!denied.contains(group.id) && cameras.Load(group.id) == 0) {
-            AppendNamed(list, group)["camera"] = IdsOf(cameras.GetCamMap());
+        const bool is_playable = !denied.contains(group.id) && cameras.Load(group.id) == 0;
+        Json::Value live = Json::arrayValue;
+        for (const int id : group.camera_ids) {
+            if (!unwatchable.contains(id)) {
+                live.append(id);
+            }
+        }
+        if (is_playable || !live.empty()) {
+            Json::Value& json = AppendNamed(list, group);
+            json["camera"] = is_playable ? IdsOf(cameras.GetCamMap()) : Json::Value(Json::arrayValue);
+            json["live"] = std::move(live);
         }
     }
     return SuccessAnswer(data);

@@ -160,10 +160,7 @@ admin::PairingOutcome AddByLine(store::Store& store, const std::string& line, co
                            .address = request.address.empty() ? offer.address : request.address,
                            .port = request.change.port.value_or(offer.port),
                            .certificate = remote::CertificatesIn(offer.certificate)};
-    if (!request.yes) {
-        admin::RequireSameServer(store, server);
-    }
-    server = admin::AddServer(store, {}, server, offer.secret, offer.cameras, false);
+    server = admin::AddServer(store, {}, server, offer.secret, offer.cameras, {.confirmed = request.yes});
     return {server, offer.secret, offer.cameras.size()};
 }
 

@@ -188,6 +188,9 @@ LastErrors ReadLastErrors(const std::filesystem::path& log_folder, std::size_t l
         last.has_files = true;
         std::vector<LoggedError> found = ErrorsIn(ReadEnd(log));
         std::reverse(found.begin(), found.end());
+        for (LoggedError& error : found) {  // a clock that was ahead must not hide what came later
+            error.time_ms = std::min(error.time_ms, log.changed.first * 1000 + 999);
+        }
         errors.insert(errors.end(), std::make_move_iterator(found.begin()), std::make_move_iterator(found.end()));
         std::ranges::stable_sort(errors, std::greater<>(), &LoggedError::time_ms);
         errors.resize(std::min(errors.size(), limit));

@@ -31,6 +31,18 @@ const rememberedFor = (userId: number, isSettingUp = false): RememberedState => 
 };
 const kScreens = { wall: WallScreen, events: EventsScreen, maps: MapsScreen, settings: SettingsScreen };
 
+const kNamesMs = 30_000;
+
+/** Names by id. A burst of alerts asks for the list of cameras once. */
+function cameraNames(server: Server): (id: number) => Promise<string> {
+  let list: ReturnType<Server["cameras"]> | null = null;
+  let askedMs = 0;
+  return async (id) => {
+    if (!list || performance.now() - askedMs > kNamesMs) [list, askedMs] = [server.cameras(), performance.now()];
+    return (await list).camera?.find((one) => one.id === id)?.name ?? "";
+  };
+}
+
 export class App {
   readonly #root: HTMLElement;
   readonly #server = new Server(() => this.#showLogin("Your session has ended. Please log in again."));
@@ -120,8 +132,7 @@ export class App {
     const { signal } = this.#watching;
     const admits = (kind: EventKind) => isKindChosen(preferences, kind);
     void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, admits, signal);
-    const nameOf = async (id: number) => (await this.#server.cameras()).camera?.find((one) => one.id === id)?.name ?? "";
-    new AlertNotifications(account.user_id).follow(this.#server.alerts, nameOf, signal);
+    new AlertNotifications(account.user_id).follow(this.#server.alerts, cameraNames(this.#server), signal);
     this.#followRoute();
   }
 

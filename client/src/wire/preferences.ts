@@ -38,8 +38,8 @@ export class Preferences {
     this.#values = values;
     // A page that is left may get no other moment.
     const { signal } = this.#closing;
-    document.addEventListener("visibilitychange", () => void (document.hidden && this.#tell()), { signal });
-    addEventListener("pagehide", () => void this.#tell(), { signal });
+    document.addEventListener("visibilitychange", () => void (document.hidden && this.flush()), { signal });
+    addEventListener("pagehide", () => void this.flush(), { signal });
   }
 
   /** Those of the session's account. Never rejects: where the server does not say, there are none. */
@@ -90,8 +90,9 @@ export class Preferences {
       // What could not be told is told with the next change; what was refused would be refused again.
       if (status === 0 || status === 429 || status >= 500) {
         if (!this.#closing.signal.aborted) this.#changes = { ...changes, ...this.#changes };
-        return;
       }
+      // Only what can never be taken is given up.
+      if (status !== 400) return;
     }
     if (this.#takesOver) forgetKeptByBrowser();
   }

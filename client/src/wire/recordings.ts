@@ -29,7 +29,10 @@ export interface CameraHistory {
 export interface Group {
   id: number;
   name: string;
+  /** Those that the user may play back. */
   cameras: number[];
+  /** Those that the user may watch. */
+  live: number[];
 }
 
 /** Where a stream begins. With `from` the frames from there on come first, as fast as they can. */
@@ -152,9 +155,9 @@ export class Recordings {
   }
 
   async groups(): Promise<Group[]> {
-    type RawGroup = { id: number; name: string; camera: number[] };
+    type RawGroup = { id: number; name: string; camera: number[]; live: number[] };
     const answer = await this.#server.call<{ group: RawGroup[] }>("VEXO.Catalog", "Groups", {});
-    return answer.group.map(({ id, name, camera }) => ({ id, name, cameras: camera }));
+    return answer.group.map(({ id, name, camera, live }) => ({ id, name, cameras: camera, live }));
   }
 
   /** What the server knows of it now; null when there is no such thing, or not for this user. */

@@ -115,7 +115,7 @@ export class FakeArchive {
           headers: { "Content-Type": "image/jpeg", "X-Capture-Time": (number("time_ms") / 1000).toFixed(3) },
         });
       case "VEXO.Catalog Groups":
-        return json({ group: [{ id: 1, name: "Yard", camera: [1, 2] }] });
+        return json({ group: [{ id: 1, name: "Yard", camera: [1, 2], live: [1, 2] }] });
       case "VEXO.Catalog Rights":
         return json({ camera: [1, 2].map((id) => ({ id, live: true, audio: true, playback: true, export: !this.notExported.includes(id) })) });
       case "VEXO.Playback SetRate": {

@@ -113,7 +113,7 @@ class Pairing : public store::StoreTest {
     int AddOwner(const std::vector<store::RemoteCamera>& cameras) {
         return AddServer(store_, manager_,
                          {.name = "Owner", .address = "192.0.2.1", .port = 8443, .certificate = kCertificate},
-                         std::string(64, 'a'), cameras, true)
+                         std::string(64, 'a'), cameras, {.shows_cameras = true})
             .id;
     }
 
@@ -171,7 +171,7 @@ TEST_P(Pairing, EndsWithTheRightOfWhoeverAskedForTheCode) {
     EXPECT_EQ(Try(store_, secret), "invalid") << "no manager any more";
     users_.SetPrivilege(manager_.user_id, store::Privilege::kManager);
     AddServer(store_, {}, {.name = "Watcher", .address = "192.0.2.1", .port = 1, .certificate = kCertificate},
-              std::string(64, 'a'), {}, false);
+              std::string(64, 'a'), {}, {});
     EXPECT_EQ(Try(store_, secret), "name") << "would replace a host that this one asks for cameras";
     EXPECT_THROW(NewSecret(), store::AlreadyExists);
     RemoveServer(store_, {}, 1, {}, false);
@@ -213,7 +213,7 @@ TEST_P(Pairing, IsOneHoweverManyTakeTheCodeAtOnce) {
 TEST_P(Pairing, IsChangedByManagersAloneAndTellsWhatGoesWithIt) {
     const std::vector<store::RemoteCamera> cameras{{.id_on_server = 4, .name = "Yard"}};
     EXPECT_THROW(AdmitServer(store_, viewer_, "Watcher"), Forbidden);
-    EXPECT_THROW(AddServer(store_, viewer_, {}, std::string(64, 'a'), cameras, true), Forbidden);
+    EXPECT_THROW(AddServer(store_, viewer_, {}, std::string(64, 'a'), cameras, {}), Forbidden);
     const int id = AddOwner(cameras);
     EXPECT_EQ(store::Settings(store_).Find("cms"), "on");
     EXPECT_THROW(PutServerCameras(store_, viewer_, id, {}), Forbidden);

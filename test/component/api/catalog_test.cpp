@@ -42,12 +42,12 @@ TEST_F(CatalogApi, ListsGroupsAndMountsThatTheCallerMaySee) {
     store::Users(footage_.Records()).DenyGroup(2, yard);
     viewer_ = host_.LogIn("guest").secret;
     store::Mounts(footage_.Records()).Add({.name = "Empty", .path = "/nowhere"});
-    const auto listed = [&](const char* method, const char* key, bool as_viewer) {
+    const auto listed = [&](const char* method, const char* key, bool as_viewer, const char* cameras = "camera") {
         std::string text;
         const Json::Value answer = Ask(std::string("Catalog&version=1&method=") + method, "", as_viewer).Json();
         for (const Json::Value& each : answer["data"][key]) {
             text += each["name"].asString() + ':';
-            for (const Json::Value& camera : each["camera"]) {
+            for (const Json::Value& camera : each[cameras]) {
                 text += camera.asString() + ' ';
             }
         }
@@ -55,8 +55,13 @@ TEST_F(CatalogApi, ListsGroupsAndMountsThatTheCallerMaySee) {
     };
     EXPECT_EQ(listed("Groups", "group", false), "Front:1 2 Yard:3 ");
     EXPECT_EQ(listed("Groups", "group", true), "Front:1 ");
+    EXPECT_EQ(listed("Groups", "group", true, "live"), "Front:1 ");
     EXPECT_EQ(listed("Mounts", "mount", false), "Disk:1 2 3 Empty:");
     EXPECT_EQ(listed("Mounts", "mount", true), "Disk:1 ");
+    store::Users(footage_.Records()).Deny(2, 1, {store::CameraAccess::kPlayback});
+    viewer_ = host_.LogIn("guest").secret;
+    EXPECT_EQ(listed("Groups", "group", true), "Front:");
+    EXPECT_EQ(listed("Groups", "group", true, "live"), "Front:1 ") << "may be watched";
 }
 
 TEST_F(CatalogApi, TellsWhatTheCallerMayDoWithTheCamerasThatHeMaySee) {

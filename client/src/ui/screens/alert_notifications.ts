@@ -43,18 +43,21 @@ export class AlertNotifications {
     const show = async (mark: Mark) => {
       if (!this.areOn || (!document.hidden && document.hasFocus())) return;
       const name = await cameraName(mark.camera_id).catch(() => "");
-      if (!signal.aborted) notifyOf(mark, name);
+      if (!signal.aborted) notifyOf(mark, name, signal);
     };
     alerts.listenFresh((mark) => void show(mark), signal);
   }
 }
 
 /** The newest of a camera replaces the one before, so that a busy night does not fill the screen. */
-function notifyOf({ id, kind, camera_id, text }: Mark, name: string): void {
+function notifyOf({ id, kind, camera_id, text }: Mark, name: string, signal: AbortSignal): void {
   const title = name ? `${name}: ${kKinds[kind]}` : kKinds[kind];
   try {
     const made = new Notification(title, { body: text.join("\n").slice(0, kMaxTextLength), tag: `lookhaven-camera-${camera_id}` });
+    // Nothing of an account stays after its session.
+    signal.addEventListener("abort", () => made.close());
     made.onclick = () => {
+      if (signal.aborted) return;
       window.focus();
       location.hash = `#${kind}=${id}`;
       made.close();

@@ -176,7 +176,7 @@ export class EventsScreen extends Screen {
     this.#error = "";
     const ignore = () => undefined;
     // A host without a catalogue has no groups; and whatever is offered, the server refuses what is denied.
-    void this.#recordings.groups().then((groups) => this.#overview.filter.setGroups(groups), ignore);
+    void this.#recordings.groups().then((groups) => this.#overview.filter.setGroups(groups.filter(({ cameras }) => cameras.length > 0)), ignore);
     const deny = (denied: ReadonlySet<number>) => [this.#transport, this.#export].forEach((one) => one.deny(denied));
     void this.#exports.denied().then(deny, ignore);
     this.#showLanes();

@@ -161,7 +161,7 @@ export class WallScreen extends Screen {
     const absent = this.#absent.all.filter(({ camera }) => this.#isInGroup(camera));
     this.#grid.setCameras(this.#shown, absent);
     const listed = new Set([...(this.#cameras ?? []), ...this.#absent.all.map(({ camera }) => camera)].map(({ id }) => id));
-    const groups = (this.#groups ?? []).filter(({ id, cameras }) => id === this.#group || cameras.some((one) => listed.has(one)));
+    const groups = (this.#groups ?? []).filter(({ id, live }) => id === this.#group || live.some((one) => listed.has(one)));
     this.#tabs.show(groups, this.#group);
     if (listed.size > 0) this.#showGroupMessage();
   }
@@ -173,7 +173,7 @@ export class WallScreen extends Screen {
 
   #isInGroup({ id }: Camera): boolean {
     if (this.#group === null || this.#groups === null) return true;
-    return this.#groups.find((one) => one.id === this.#group)?.cameras.includes(id) ?? false;
+    return this.#groups.find((one) => one.id === this.#group)?.live.includes(id) ?? false;
   }
 
   #showGroupMessage(): void {
