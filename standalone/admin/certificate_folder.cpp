@@ -35,7 +35,7 @@ CertificateFolder::CertificateFolder(const base::Installation& installation)
       other_(home_ / "tls.new"),
       lock_(base::TryLockFile(installation.CertificateLockFile())) {
     if (!lock_) {
-        throw StillNeeded("the certificate is being replaced by somebody else at this moment");
+        throw StillNeeded("the certificate is being replaced or backed up at this moment");
     }
 }
 

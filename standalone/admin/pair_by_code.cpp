@@ -3,6 +3,7 @@
 
 #include "standalone/admin/servers.h"
 #include "standalone/base/host_name.h"
+#include "standalone/base/log.h"
 #include "standalone/remote/camera_list.h"
 #include "standalone/remote/certificate_loader.h"
 #include "standalone/remote/fetch.h"
@@ -101,9 +102,14 @@ PairingOutcome PairByCode(const Records& records, const Actor& actor, store::Rec
     }
     records.close();
     const Offer offer = Accept(server, code);
-    return {AddServer(records.open(), actor, server, offer.secret, offer.cameras,
-                      {.shows_cameras = true, .confirmed = confirmed}),
-            offer.secret, offer.cameras.size()};
+    try {
+        return {AddServer(records.open(), actor, server, offer.secret, offer.cameras,
+                          {.shows_cameras = true, .confirmed = confirmed}),
+                offer.secret, offer.cameras.size()};
+    } catch (const store::StoreError& error) {
+        base::LogError(std::string("a host that has accepted this one cannot be stored: ") + error.what());
+        throw Failed(Reason::kUnclear);
+    }
 }
 
 }  // namespace lookhaven::admin

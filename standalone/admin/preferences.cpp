@@ -44,11 +44,17 @@ Json::Value SetPreferences(store::Store& store, int user_id, const Json::Value& 
     if (!changes.isObject()) {
         throw store::InvalidRecord("preferences are one JSON object");
     }
+    // Before the store is locked. All of them may be replaced at once, each by one of another name.
+    if (changes.size() > 2 * kMaxPreferences) {
+        throw store::InvalidRecord("an account has at most " + std::to_string(kMaxPreferences) + " preferences");
+    }
+    for (const std::string& name : changes.getMemberNames()) {
+        RequirePreference(name, changes[name]);
+    }
     Json::Value preferences;
     store::Preferences(store).Change(user_id, [&](const std::string& stored) {
         preferences = FromStored(stored);
         for (const std::string& name : changes.getMemberNames()) {
-            RequirePreference(name, changes[name]);
             if (changes[name].isNull()) {
                 preferences.removeMember(name);
             } else {

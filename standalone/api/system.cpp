@@ -65,7 +65,7 @@ bool IsToken(store::Store& records, std::string_view token) {
 }
 
 // Returns the store as TryToOpen gives it. Throws Failure 401 for a caller that is no monitor, 503 when too many are
-// asking. What can be refused without opening the store is refused before.
+// asking, or for a monitor elsewhere whose token cannot be compared, as the store cannot be opened. What can be refused without opening the store is refused before.
 store::Store* AdmitMonitor(const Call& call) {
     constexpr std::string_view kScheme = "Bearer ";
     constexpr std::size_t kMaxMonitors = 4;
@@ -80,7 +80,10 @@ store::Store* AdmitMonitor(const Call& call) {
         throw Failure(503, "too many monitors are asking", http::kRetrySoonSeconds);
     }
     store::Store* const records = TryToOpen(call);
-    if (!is_from_here && (records == nullptr || !IsToken(*records, token))) {
+    if (!is_from_here && records == nullptr) {
+        throw Failure(503, "the record store cannot be opened", http::kRetrySoonSeconds);
+    }
+    if (!is_from_here && !IsToken(*records, token)) {
         throw Failure(401, kNoMonitor);
     }
     return records;

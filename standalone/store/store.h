@@ -27,7 +27,7 @@ class StoreError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// The database server cannot be reached, or the connection to it was lost: what fails for that alone may be tried
+// The database server cannot be connected to, or the connection to it was lost: what fails for that alone may be tried
 // again.
 class StoreUnavailable : public StoreError {
   public:

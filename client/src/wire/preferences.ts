@@ -5,7 +5,7 @@
 //
 // Why so        On the server it follows the account to every browser, and stays apart where two accounts share one. A
 //               server that fails holds nobody up: a session without what was preferred is better than none.
-//               What belongs to a device alone stays with it: notifications (alert_notifications). Sound and full
+//               What belongs to one browser alone stays there: notifications (alert_notifications). Sound and full
 //               screen take a click each time, without which browsers allow neither.
 // Invariants    (1) Only what was changed here is told, by name: what another tab changes stays.
 //               (2) It is told for the account that was asked for: once somebody else has logged in in another tab,

@@ -62,7 +62,7 @@ export class AccountMenu {
     box.addEventListener("change", async () => {
       if (!box.checked) return notifications.turnOff();
       box.checked = await notifications.turnOn();
-      if (!box.checked) notify("The browser does not allow notifications from this site. Its settings for the site do.");
+      if (!box.checked) notify("Your browser blocks notifications from this site. Allow them in its settings for this site.");
     });
     return element("label", { class: "account-item" }, box, "Notify me of alerts");
   }
