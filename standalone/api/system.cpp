@@ -65,7 +65,8 @@ bool IsToken(store::Store& records, std::string_view token) {
 }
 
 // Returns the store as TryToOpen gives it. Throws Failure 401 for a caller that is no monitor, 503 when too many are
-// asking, or for a monitor elsewhere whose token cannot be compared, as the store cannot be opened. What can be refused without opening the store is refused before.
+// asking, or for a monitor elsewhere whose token cannot be compared, as the store cannot be opened. What can be refused
+// without opening the store is refused before.
 store::Store* AdmitMonitor(const Call& call) {
     constexpr std::string_view kScheme = "Bearer ";
     constexpr std::size_t kMaxMonitors = 4;

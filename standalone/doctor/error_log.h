@@ -2,9 +2,10 @@
 //
 // The last errors in the log files of an installation: those of our programs (base/log.h) and of the web server.
 //
-// Invariants    (1) At most kMaxFiles files are read, the newest, and of each no more than its last kMaxFileBytes. (2) Only regular files of one name are: no symbolic link, and none that another folder has,
-//                   too. (3) A text is UTF-8 in one line, of kMaxTextBytes at most, without account, password and query
-//                   of any address in it.
+// Invariants    (1) At most kMaxFiles files are read, the newest, and of each no more than its last kMaxFileBytes.
+//               (2) Only regular files of one name are: no symbolic link, and none that another folder has, too.
+//               (3) A text is UTF-8 in one line, of kMaxTextBytes at most, without account, password and query of any
+//                   address in it.
 #pragma once
 
 #include <cstddef>
