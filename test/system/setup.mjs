@@ -43,7 +43,7 @@ await visit(async (page, complaints) => {
   await report("group", { row: await page.locator(".record-row", { hasText: "Deliveries" }).innerText() });
 
   const dialog = (name) => page.getByRole("dialog", { name });
-  const row = (name) => page.locator(".emap-row", { hasText: name });
+  const row = (name) => page.locator(".emap-row", { has: page.getByRole("heading", { name, exact: true }) });
   await page.evaluate(() => void (location.hash = "#settings=maps"));
   await row("Upper floor").locator("img").waitFor();
   await page.setViewportSize({ width: 390, height: 844 });
