@@ -179,7 +179,7 @@ TEST_F(EventApi, WhoMayPlayButNotExportSeesPicturesAndGetsNoFile) {
     } rows[] = {
         {"Event&version=1&method=Get&event=" + event, ""},
         {"Event&version=1&method=Frame&time_ms=0&event=" + event, ""},
-        {"Picture&version=1&method=At&frame=0&event=" + event, ""},
+        {"Picture&version=1&method=At&width=640&frame=0&event=" + event, ""},
         {"Event&version=1&method=Download&event=" + event, "Event&version=1&method=Download&event=99"},
         {"Event&version=1&method=Download&kind=alert&event=" + alert,
          "Event&version=1&method=Download&kind=alert&event=99"},
