@@ -30,6 +30,7 @@ export class Preferences {
   #takesOver = false;
   #settling: ReturnType<typeof setTimeout> | undefined;
   #telling: Promise<void> = Promise.resolve();
+  #isTelling = false;
   readonly #closing = new AbortController();
 
   private constructor(server: Server, user: number, values: Values) {
@@ -64,9 +65,9 @@ export class Preferences {
     this.#settling = setTimeout(() => void this.flush(), kSettleMs);
   }
 
-  /** Resolves once the server has been told; never rejects. */
+  /** Begins at once unless it is being told already: none overtakes another. Resolves when done; never rejects. */
   flush(): Promise<void> {
-    return (this.#telling = this.#telling.then(() => this.#tell()));
+    return (this.#telling = this.#isTelling ? this.#telling.then(() => this.#tell()) : this.#tell());
   }
 
   /** The session is over: what was not told is lost. */
@@ -81,6 +82,7 @@ export class Preferences {
     const changes = this.#changes;
     if (Object.keys(changes).length === 0) return;
     this.#changes = {};
+    this.#isTelling = true;
     const json = { id: this.#user, preferences: changes };
     try {
       const how = { json, quiet: true, keepalive: true, timeoutMs: kTimeoutMs };
@@ -93,6 +95,8 @@ export class Preferences {
       }
       // Only what can never be taken is given up.
       if (status !== 400) return;
+    } finally {
+      this.#isTelling = false;
     }
     if (this.#takesOver) forgetKeptByBrowser();
   }

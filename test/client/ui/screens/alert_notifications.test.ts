@@ -47,12 +47,14 @@ beforeEach(() => {
 });
 afterEach(() => void vi.unstubAllGlobals());
 
-async function report(notifications: AlertNotifications, isFresh = true, nameOf = async () => "Yard", times = 1) {
+/** `act` is called before the session ends. */
+async function report(notifications: AlertNotifications, isFresh = true, nameOf = async () => "Yard", times = 1, act: () => void = () => undefined) {
   const alerts = new Alerts();
   const ending = new AbortController();
   notifications.follow(alerts, nameOf, ending.signal);
   for (let i = 0; i < times; ++i) alerts.note(kMark, isFresh);
   await new Promise((done) => setTimeout(done));
+  act();
   ending.abort();
   alerts.note(kMark, true);
   await new Promise((done) => setTimeout(done));
@@ -87,11 +89,14 @@ test("is off until turned on, for each account by itself, and where the browser 
 test("a click opens the event; one of a camera replaces another; no name and no constructor are no error", async () => {
   const notifications = new AlertNotifications(1);
   await notifications.turnOn();
-  expect(await report(notifications, true, () => Promise.reject(new Error("away")), 2)).toEqual(["Alert", "Alert"]);
+  const click = () => void FakeNotification.shown[0]!.onclick();
+  expect(await report(notifications, true, () => Promise.reject(new Error("away")), 2, click)).toEqual(["Alert", "Alert"]);
   const [one, other] = FakeNotification.shown;
   expect(one!.options.tag).toBe(other!.options.tag);
   expect(one!.options.body.length).toBe(200);
-  one!.onclick();
-  expect([location.hash, one!.close.mock.calls.length]).toEqual(["#alert=7", 1]);
+  expect([location.hash, one!.close.mock.calls.length]).toEqual(["#alert=7", 2]);
+  location.hash = "";
+  other!.onclick();
+  expect([location.hash, other!.close.mock.calls.length], "gone with the session").toEqual(["", 1]);
   expect(await report(notifications, true, async () => "Forbidden")).toEqual(["Alert", "Alert"]);
 });
