@@ -14,6 +14,9 @@ from players import numbered, playing
 from visit import Visit
 
 
+WATCH = 1  # over HTTPS a page is told of alerts by a request of its own, hidden or not
+
+
 class BrowserTest(unittest.TestCase):
     def setUp(self):
         self.server = self.enterContext(Installation())
@@ -28,10 +31,10 @@ class BrowserTest(unittest.TestCase):
                 self.assertEqual(seen["peak"] > 0.01, is_heard, f"{step}: loudest sample {seen['peak']}")
 
             visit.see("hidden")
-            wait_until(lambda: self.server.requests() == self.idle, 2, "the stream of a hidden tab ends")
+            wait_until(lambda: len(self.server.requests() - self.idle) == WATCH, 2, "the stream of a hidden tab ends")
 
             self.assertEqual(visit.see("seen again")["complaints"], [])
-            self.assertGreater(len(self.server.requests()), len(self.idle), "nothing streams")
+            self.assertGreater(len(self.server.requests() - self.idle), WATCH, "nothing streams")
 
     def recorded_camera(self, name, fps):
         source = f"test:mjpeg?size=640x360&fps={fps}&label={name}"
@@ -82,7 +85,7 @@ class BrowserTest(unittest.TestCase):
             self.assertLessEqual(max(times) - min(times), frame_ms + arrival_ms, times)
             self.assertLess(abs(times[0] / 1000 - told), 4, "plays from where it was let go")
             closed = visit.see("closed")
-            wait_until(lambda: len(self.server.requests() - self.idle) == 8, 2, "the closed one's player ends")
+            wait_until(lambda: len(self.server.requests() - self.idle) == 8 + WATCH, 2, "the closed one's player ends")
             self.assertEqual(closed["violations"] + closed["complaints"], [])
 
     def test_a_visit_over_https_and_http(self):
