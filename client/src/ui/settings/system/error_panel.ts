@@ -2,13 +2,13 @@
 //
 // The last errors that the server has logged, for whoever has no shell there; and where else to look.
 
-import { asServerError } from "../../../wire/server";
 import type { LogTail, System } from "../../../wire/system";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { plainTable, scrolled } from "../../widgets/table";
 import { minuteText } from "../../widgets/text";
+import { LoadedPart } from "../loaded_part";
 import { copyable } from "./copyable";
 
 /** At first; the server tells at most as many as `kMost`. */
@@ -16,30 +16,23 @@ const kFew = 10;
 const kMost = 200;
 const kJournalCommand = "journalctl -u 'lookhaven-*' -g ' error: '";
 
+const kTitle = "Last errors";
+
 export class ErrorPanel {
-  readonly root = element("div", { class: "form-group" });
+  readonly #part: LoadedPart;
   readonly #system: System;
-  readonly #closed: AbortSignal;
 
   constructor(system: System, closed: AbortSignal) {
+    this.#part = new LoadedPart(kTitle, closed);
     this.#system = system;
-    this.#closed = closed;
+  }
+
+  get root(): HTMLElement {
+    return this.#part.root;
   }
 
   async load(limit = kFew): Promise<void> {
-    if (this.root.childElementCount === 0) this.#show(element("p", { class: "quiet", role: "status" }, "Loading…"));
-    try {
-      const tail = await this.#system.logTail(limit);
-      if (!this.#closed.aborted) this.#show(...this.#content(tail, limit));
-    } catch (error) {
-      if (this.#closed.aborted) return;
-      const again = button("Try again", () => void this.load(limit));
-      this.#show(element("p", { role: "alert" }, asServerError(error).message), again);
-    }
-  }
-
-  #show(...content: Node[]): void {
-    this.root.replaceChildren(formPart("Last errors", ...content));
+    await this.#part.fill(async () => [formPart(kTitle, ...this.#content(await this.#system.logTail(limit), limit))]);
   }
 
   #content({ entry, files, journal }: LogTail, limit: number): Node[] {
@@ -48,10 +41,10 @@ export class ErrorPanel {
       const cells = [process, what].map((words) => element("td", {}, words));
       return element("tr", {}, element("th", { scope: "row" }, minuteText(time * 1000)), ...cells);
     });
-    const table = rows.length > 0 ? [scrolled("Last errors", plainTable(["Time", "Process", "Error"], rows))] : [];
+    const table = rows.length > 0 ? [scrolled(kTitle, plainTable(["Time", "Process", "Error"], rows))] : [];
     const more = button(`Show up to ${kMost}`, () => void this.load(kMost), "plain");
     const none = files ? "No errors in the log files of this server." : "This server has no log files.";
-    const elsewhere = "Its programs log to the journal of the system, which is not shown here. On the server, read it with:";
+    const elsewhere = "The programs of this server log to the journal of the system, which is not shown here. On the server, read it with:";
     return [
       ...table,
       ...(entry.length === limit && limit < kMost ? [element("div", { class: "form-buttons" }, more)] : []),

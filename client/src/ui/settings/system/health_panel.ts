@@ -1,40 +1,36 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is wrong with the installation, the worst first, and what to do about it; its parts and its certificate.
+// What is wrong with the installation, the worst first, and what to do about it; its processes and its certificate.
 
 import type { Certificate, System, SystemStatus } from "../../../wire/system";
-import { asServerError } from "../../../wire/server";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { factList } from "../../widgets/fact_list";
 import { formPart } from "../../widgets/fields";
 import { calendarDate } from "../../widgets/text";
+import { LoadedPart } from "../loaded_part";
 import { askForCertificate } from "./certificate_dialog";
 import { copyable } from "./copyable";
 import { commandOf, kKindNames, linesOf, processName, processText, storeText, summaryText, type Line } from "./system_text";
 
 export class HealthPanel {
-  readonly root = element("div", { class: "form-group" });
+  readonly #part: LoadedPart;
   readonly #system: System;
   readonly #closed: AbortSignal;
 
   constructor(system: System, closed: AbortSignal) {
+    this.#part = new LoadedPart("Health", closed, "Running the checks; this may take seconds…");
     this.#system = system;
     this.#closed = closed;
   }
 
+  get root(): HTMLElement {
+    return this.#part.root;
+  }
+
   /** Looks at everything, which may take seconds. What was seen before stays until then. */
   async load(): Promise<void> {
-    const text = element("p", { class: "quiet", role: "status" }, "Running the checks; this may take seconds…");
-    if (this.root.childElementCount === 0) this.root.append(formPart("Health", text));
-    try {
-      const status = await this.#system.status(this.#closed);
-      if (!this.#closed.aborted) this.root.replaceChildren(...content(status, () => void this.#replaceCertificate()));
-    } catch (error) {
-      if (this.#closed.aborted) return;
-      const message = element("p", { role: "alert" }, asServerError(error).message);
-      this.root.replaceChildren(formPart("Health", message, button("Try again", () => void this.load())));
-    }
+    await this.#part.fill(async () => content(await this.#system.status(this.#closed), () => void this.#replaceCertificate()));
   }
 
   async #replaceCertificate(): Promise<void> {

@@ -2,7 +2,6 @@
 //
 // How much the server logs of what it does, by category.
 
-import { asServerError } from "../../../wire/server";
 import type { LogLevels, System } from "../../../wire/system";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
@@ -10,6 +9,7 @@ import { factList } from "../../widgets/fact_list";
 import { formPart, selectField, type Field } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
+import { LoadedPart } from "../loaded_part";
 import { Seen } from "../seen";
 
 const kNames: Record<string, string> = { liveview: "Live view", player: "Players", others: "Everything else" };
@@ -17,33 +17,28 @@ const kHint = "Messages of this level and more severe ones are logged. Levels ho
 /** The most severe first. */
 const kOrder = ["off", "error", "warning", "notice", "info", "debug"];
 
+const kTitle = "Log levels";
+
 export class LogPanel {
-  readonly root = element("div", { class: "form-group" });
+  readonly #part: LoadedPart;
   readonly #system: System;
-  readonly #closed: AbortSignal;
 
   constructor(system: System, closed: AbortSignal) {
+    this.#part = new LoadedPart(kTitle, closed);
     this.#system = system;
-    this.#closed = closed;
+  }
+
+  get root(): HTMLElement {
+    return this.#part.root;
   }
 
   async load(): Promise<void> {
-    if (this.root.childElementCount === 0) this.#show(element("p", { class: "quiet", role: "status" }, "Loading…"));
-    try {
+    await this.#part.fill(async () => {
       const levels = await this.#system.logLevels();
-      if (this.#closed.aborted) return;
       const change = button("Change log levels…", () => void this.#change(levels));
       const facts = entries(levels).map(([name, level]): [string, string] => [labelOf(name), level]);
-      this.#show(factList(facts), element("div", { class: "form-buttons" }, change));
-    } catch (error) {
-      if (this.#closed.aborted) return;
-      const again = button("Try again", () => void this.load());
-      this.#show(element("p", { role: "alert" }, asServerError(error).message), again);
-    }
-  }
-
-  #show(...content: Node[]): void {
-    this.root.replaceChildren(formPart("Log levels", ...content));
+      return [formPart(kTitle, factList(facts), element("div", { class: "form-buttons" }, change))];
+    });
   }
 
   async #change(levels: LogLevels): Promise<void> {
@@ -55,7 +50,7 @@ export class LogPanel {
     });
     const seen = new Seen({ ...levels, name: "the log levels" }, "Save");
     const isDone = await openDialog(this.root, {
-      title: "Log levels",
+      title: kTitle,
       content: [element("p", { class: "form-hint" }, kHint), ...fields.map(([, field]) => field.root)],
       submit: "Save",
       attempt: () => {
