@@ -18,7 +18,8 @@ struct Method {
     // The whole answer; empty when it went to standard output already. Throws Failure for what the caller did wrong or
     // cannot have.
     std::string (*serve)(const Call& call);
-    enum class Effect { kReads, kChanges } effect = Effect::kReads;  // what changes something takes POST only
+    // kChanges takes POST only; so do methods that read what no address may tell, such as accounts.
+    enum class Effect { kReads, kChanges } effect = Effect::kReads;
     enum class Audience { kEverybody, kManagers } audience = Audience::kEverybody;
 };
 

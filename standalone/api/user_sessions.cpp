@@ -13,7 +13,7 @@ namespace lookhaven::api {
 namespace {
 
 // The account whose sessions are asked for.
-int OwnerOf(const Call& call) {
+int AccountAskedFor(const Call& call) {
     const int own = call.Actor().user_id;
     const Json::Value& id = call.Parameter("id");
     if (id.isNull() || id.asInt() == own) {
@@ -26,7 +26,7 @@ int OwnerOf(const Call& call) {
 }
 
 std::vector<store::Session> SessionsOf(const Call& call) {
-    return admin::SessionsOf(call.Records(), call.Actor(), OwnerOf(call));
+    return admin::SessionsOf(call.Records(), call.Actor(), AccountAskedFor(call));
 }
 
 // What names a session here. Not its handle, by which other processes of this machine know it.
@@ -64,7 +64,7 @@ std::string Sessions(const Call& call) {
 std::string EndSessions(const Call& call) {
     const Json::Value& key = call.Parameter("key");
     Json::Value data;
-    data["ended"] = admin::EndSessions(call.Records(), call.Actor(), OwnerOf(call),
+    data["ended"] = admin::EndSessions(call.Records(), call.Actor(), AccountAskedFor(call),
                                        key.isNull() ? std::nullopt : std::optional(HandleOf(call, key.asString())),
                                        call.login.value().session_handle);
     return SuccessAnswer(data);

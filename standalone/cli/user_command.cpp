@@ -173,7 +173,9 @@ std::string EndOfAllowance(Users& users, int user, const Request& request) {
     if (!request.camera || std::ranges::none_of(kinds, is_denied)) {
         return ".";
     }
-    return kinds == std::vector{CameraAccess::kExport} && is_denied(CameraAccess::kPlayback)
+    const bool is_export_alone = std::ranges::all_of(
+        kinds, [&](CameraAccess kind) { return kind == CameraAccess::kExport || !is_denied(kind); });
+    return is_export_alone && is_denied(CameraAccess::kPlayback)
                ? ", but playback of it is denied, without which nothing is exported."
                : ", but belongs to a group that is denied.";
 }
