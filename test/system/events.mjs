@@ -39,18 +39,17 @@ await visit(async (page, complaints) => {
     const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
     return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time.slice(0, 8)}`) / 1000 + Number(time.slice(8));
   };
-  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, go on
-  // towards the seconds with the wheel, and look again.
-  let x = box.width / 2;
+  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, pan it to
+  // the middle, for near an edge the timeline follows what plays, go on towards the seconds, and look again.
+  const x = box.width / 2;
   let scale;
   const aim = async () => {
-    const away = x < box.width / 2 ? 400 : -400;
-    const [here, there] = [await timeAt(x), await timeAt(x + away)];
-    scale = (there - here) / away;
-    x += (middle - here) / scale;
+    const [here, before] = [await timeAt(x), await timeAt(x - 400)];
+    scale = (here - before) / 400;
+    await page.mouse.move(box.x + x, y);
+    await page.mouse.wheel((middle - here) / scale, 0);
   };
   for (await aim(); scale > 0.2; await aim()) {
-    await page.mouse.move(box.x + x, y);
     for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
   }
   await timeAt(x);
@@ -74,8 +73,7 @@ await visit(async (page, complaints) => {
   await next("ArrowLeft", before.told - 1);
   await report("two back", await shown());
 
-  // The end of what is recorded may be too near for a jump forward.
-  const by = box.width - x > 3 / scale ? 3 : -3;
+  const by = 3;  // seconds
   await timeAt(x + by / scale);
   await page.keyboard.press(" ");
   await settled("paused");
