@@ -87,7 +87,7 @@ void RecordUntilKilled(const Clip& clip, const std::filesystem::path& path, int 
 
 // Whatever was captured half a second before a Write that returned is on the disk, however slow the machine is.
 TEST(RecordingWriter, LosesHalfASecondAtMostWhenKilledAnywhere) {
-    constexpr int kBatches = 10;
+    constexpr int kBatches = 4;
     constexpr int kAtOnce = 10;
     const Clip* clips[] = {&MakeClip(kMjpeg), &MakeClip(kH264, "-c:a aac -ar 16000")};
     const unsigned seed = std::random_device{}();

@@ -116,7 +116,7 @@ TEST_P(RecordingTest, AKillCostsNoMoreThanTheLastSecond) {
     }
     std::mt19937 random(7);
     std::map<std::string, std::int64_t> died_ms;  // by the recording that was being written
-    const int kills = GetParam() == "Sqlite" ? 80 : 20;
+    const int kills = GetParam() == "Sqlite" ? 30 : 16;
     for (int kill = 0; kill < kills; ++kill) {
         Child recorder = StartRecorder();
         // At any point, recovery included; every other time once it records, however long its start takes.
