@@ -7,11 +7,13 @@
 
 #include "standalone/admin/emaps.h"
 #include "standalone/base/file.h"
+#include "standalone/base/io.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/text.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/emap_items.h"
+#include "standalone/cli/new_file.h"
 #include "standalone/cli/table.h"
 #include "standalone/emap/item_json.h"
 #include "standalone/emap/pictures.h"
@@ -111,13 +113,19 @@ void Remove(const Console& console, const Request& request) {
 }
 
 void Export(const Console& console, const Request& request) {
-    store::Store store = console.OpenStore();
-    const Emap emap = RequireEmap(store, request.id);
-    const std::string picture = emap::Pictures(store, console.Installation().Home()).Read(emap.image);
-    const Json::Value file = Object("lookhaven_emap", kFileVersion, "name", emap.name, "hideItemName", emap.hide_names,
-                                    "smallItemSize", emap.small_items, "items",
-                                    emap::ToJson(Emaps(store).Items(emap.id)), "picture", base::ToBase64(picture));
-    base::WriteFileAtomically(request.file, base::IndentedJson(file) + "\n", 0644);
+    Emap emap;
+    WriteNewFile(request.file, [&](int output) {
+        store::Store store = console.OpenStore();
+        emap = RequireEmap(store, request.id);
+        const std::string picture = emap::Pictures(store, console.Installation().Home()).Read(emap.image);
+        const Json::Value file = Object("lookhaven_emap", kFileVersion, "name", emap.name, "hideItemName",
+                                        emap.hide_names, "smallItemSize", emap.small_items, "items",
+                                        emap::ToJson(Emaps(store).Items(emap.id)), "picture", base::ToBase64(picture));
+        const std::string text = base::IndentedJson(file) + "\n";
+        if (!base::WriteAll(output, text.data(), text.size())) {
+            base::ThrowErrno("cannot write " + request.file);
+        }
+    });
     console.Answer(Object("id", emap.id, "file", request.file), "Wrote e-map ", emap.name, " to ", request.file, ".");
 }
 

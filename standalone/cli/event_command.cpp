@@ -216,15 +216,7 @@ std::filesystem::path RequireFile(store::Store& store, const Request& request) {
     return file;
 }
 
-void CopyTo(int output, const std::filesystem::path& recording, const media::ExportOptions& options) {
-    try {
-        media::Export(recording, output, options);
-    } catch (const media::SourceError& error) {
-        throw Failure(kDataError, error.what());
-    }
-}
-
-void Export(const Console& console, const Request& request) {
+void CopyTo(int output, const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::int64_t now = base::WallSeconds();
     media::ExportOptions options;
@@ -235,13 +227,19 @@ void Export(const Console& console, const Request& request) {
     if (!request.to.empty()) {
         options.end_ms = ParseMoment(request.to, now) * 1000;
     }
-    const std::filesystem::path recording = RequireFile(store, request);
+    try {
+        media::Export(RequireFile(store, request), output, options);
+    } catch (const media::SourceError& error) {
+        throw Failure(kDataError, error.what());
+    }
+}
+
+void Export(const Console& console, const Request& request) {
     if (request.file == "-") {
-        CopyTo(STDOUT_FILENO, recording, options);
+        CopyTo(STDOUT_FILENO, console, request);
         return;
     }
-    WriteNewFile(request.file, [&](int output) { CopyTo(output, recording, options); });
-    const auto size_bytes = static_cast<Json::Int64>(std::filesystem::file_size(request.file));
+    const Json::Int64 size_bytes = WriteNewFile(request.file, [&](int output) { CopyTo(output, console, request); });
     console.Answer(Object("id", request.id, "file", request.file, "size_bytes", size_bytes), "Event ", request.id,
                    " was exported to ", request.file, ".");
 }

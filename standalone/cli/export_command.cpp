@@ -101,21 +101,27 @@ void WriteTo(int output, const evidence::Plan& plan, const media::RemuxLibrary& 
     }
 }
 
+evidence::Plan WriteFootage(int output, const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
+    evidence::Plan plan = RequirePlan(store, request, remux);
+    const std::filesystem::path key = console.Installation().SigningKeyFile();
+    evidence::RequireSigningKey(key);
+    WriteTo(output, plan, remux, key);
+    return plan;
+}
+
 void Export(const Console& console, const Request& request) {
     if (request.cameras_and_file.size() < 2 || request.from.empty()) {
         throw Failure(kUsage, "export needs cameras, --from and a file: see lookhaven export --help");
     }
-    store::Store store = console.OpenStore();
-    const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
-    const evidence::Plan plan = RequirePlan(store, request, remux);
-    const std::filesystem::path key = console.Installation().SigningKeyFile();
-    evidence::RequireSigningKey(key);
     const std::string& file = request.cameras_and_file.back();
     if (file == "-") {
-        WriteTo(STDOUT_FILENO, plan, remux, key);
+        WriteFootage(STDOUT_FILENO, console, request);
         return;
     }
-    WriteNewFile(file, [&](int output) { WriteTo(output, plan, remux, key); });
+    evidence::Plan plan;
+    WriteNewFile(file, [&](int output) { plan = WriteFootage(output, console, request); });
     std::size_t gaps = 0;
     for (const evidence::Camera& camera : plan.cameras) {
         gaps += camera.gaps.size();

@@ -2,6 +2,7 @@
 #include "standalone/cli/new_file.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
@@ -9,16 +10,30 @@
 
 namespace lookhaven::cli {
 
-void WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write) {
-    if (::access(file.c_str(), F_OK) == 0) {
+namespace {
+
+// Neither a link nor somebody else's, through which it would be read.
+bool IsOwnEmptyFile(const struct stat& found) {
+    return S_ISREG(found.st_mode) && found.st_size == 0 && found.st_uid == ::geteuid() && found.st_nlink == 1;
+}
+
+}  // namespace
+
+std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write) {
+    struct stat found {};
+    if (::lstat(file.c_str(), &found) == 0 && !IsOwnEmptyFile(found)) {
         throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
     }
-    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
+    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0600);
+    if (::fstat(output.Get(), &found) != 0 || !IsOwnEmptyFile(found) || ::fchmod(output.Get(), 0600) != 0) {
+        throw Failure(kCannotCreate, "another program makes the file ", file, ": name another one");
+    }
     try {
         write(output.Get());
-        if (::fsync(output.Get()) != 0) {
+        if (::fsync(output.Get()) != 0 || ::fstat(output.Get(), &found) != 0) {
             base::ThrowErrno("cannot write " + file);
         }
+        return found.st_size;
     } catch (...) {
         if (::unlink(file.c_str()) != 0) {
             [[maybe_unused]] const int ignored = ::ftruncate(output.Get(), 0);  // no longer ours to remove

@@ -3,15 +3,17 @@
 // Files that a command makes for the operator: exports and backups.
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <string>
 
 namespace lookhaven::cli {
 
 // Makes a file that only its owner may read, and has the function write it to the borrowed descriptor; returns once it
-// is on the disk. Made at once, as whoever runs the command: the function may change to the installation's owner, who
-// may not write there. Leaves none behind when this throws: what the function throws, std::system_error, or Failure
-// where there is such a file already.
-void WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write);
+// is on the disk: how many bytes that are. Made at once, as whoever runs the command: the function may change to the
+// installation's owner, who may not write there, so opening the store belongs into it. When this throws, what the
+// function throws or std::system_error, it leaves no file behind, or where it is not its to remove any more an empty one,
+// which the next attempt takes. Throws Failure where there is another file already.
+std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write);
 
 }  // namespace lookhaven::cli

@@ -245,6 +245,29 @@ TEST_F(DemoTest, ForeignersMayNotTouchTheInstallation) {
     std::filesystem::permissions(home_, std::filesystem::perms(0700));
 }
 
+TEST_F(DemoTest, RootMakesFilesWhereTheInstallationsOwnerMayNot) {
+    if (::geteuid() != 0) {
+        GTEST_SKIP() << "needs root";
+    }
+    constexpr uid_t kOwner = 65534;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(home_)) {
+        ASSERT_EQ(::lchown(entry.path().c_str(), kOwner, kOwner), 0) << entry.path();
+    }
+    ASSERT_EQ(::chown(home_.c_str(), kOwner, kOwner), 0);
+    const std::string place = folder_ / "roots";
+    ASSERT_EQ(::mkdir(place.c_str(), 0700), 0);
+    const std::string failed = place + "/failed";
+    std::filesystem::create_symlink(folder_ / "elsewhere", place + "/link");
+    Play({{"backup " + place + "/backup", 0, "Backed up"},
+          {"emap export 1 " + place + "/map", 0, "Wrote e-map"},
+          {"emap export 1 " + place + "/map", 73, "already a file"},
+          {"emap export 1 " + place + "/link", 73, "already a file"},
+          {"export 1 --from -1h " + failed, 66, "nothing of these cameras"},
+          {"event export 999 " + failed, 66, "999"},
+          {"emap export 1 " + failed, 0, "Wrote e-map"}});
+    EXPECT_FALSE(std::filesystem::exists(folder_ / "elsewhere"));
+}
+
 TEST_F(DemoTest, ATerminalNeverShowsAPassword) {
     Outcome outcome = RunOnTerminal("user add bob", {"bob-s3cret", "bob-s3cret"});
     EXPECT_EQ(outcome.code, 0) << outcome.text;

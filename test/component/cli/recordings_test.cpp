@@ -157,13 +157,13 @@ TEST_F(RecordingsTest, MarksArePutDownForTheRecorder) {
           {"event mark 1 --kind recorded", 64, "--kind"},
           {"event list --kind alert --to 2026-03-02", 0, "at the door", "Coffee"},
           {"event show 2", 0, "2 x Coffee\nTotal"},
-          {"event export 2 /dev/null", 69, "not complete yet"}});
+          {"event export 2 -", 69, "not complete yet"}});
     store::Store store = Open();
     const store::Mark transaction = store::Marks(store).Find(store::MarkKind::kPos, 2).value();
     EXPECT_EQ(transaction.start_s, kStart - 5);
     EXPECT_EQ(transaction.end_s, kStart + 60 + 10);
     store::Marks(store).Miss(2);
-    Play({{"event export 2 /dev/null", 66, "no footage"}});
+    Play({{"event export 2 -", 66, "no footage"}});
 }
 
 TEST_F(RecordingsTest, GeneratedEventsFillASpanAndAreRemovedTogether) {
@@ -175,7 +175,7 @@ TEST_F(RecordingsTest, GeneratedEventsFillASpanAndAreRemovedTogether) {
           {"demo events --count 1000000 --days 1", 64, "do not fit"},
           {"demo events --count 1000 --days 10 --json", 0, "\"marks_added\" : 20"},
           {"mount list", 0, "1       0 B"},
-          {"event export 500 /dev/null", 66, "no footage"}});
+          {"event export 500 -", 66, "no footage"}});
     const std::vector<store::Event> all = events.List({.camera_ids = {1, 2, 3, 4}});
     ASSERT_EQ(all.size(), 1001U);
     const std::int64_t last = all.back().start_s;
