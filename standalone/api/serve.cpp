@@ -56,7 +56,7 @@ int PortIn(std::string_view text) {
 
 binding::TcpConnection ConnectionOf(const http::Request& request) {
     return {std::string(request.Header("SERVER_ADDR")), PortIn(request.Header("SERVER_PORT")),
-            std::string(request.Header("REMOTE_ADDR")), PortIn(request.Header("REMOTE_PORT"))};
+            std::string(request.Header("PEER_ADDR")), PortIn(request.Header("PEER_PORT"))};
 }
 
 // Cookie and session come first: nobody without a session may cost more than a short request.

@@ -55,6 +55,7 @@ class ServerTest(unittest.TestCase):
                 ("port of letters", {"LOOKHAVEN_PORT": "web"}, ["web", "1024"]),
                 ("the same port twice", dict.fromkeys(["LOOKHAVEN_PORT", "LOOKHAVEN_TLS_PORT"], str(free_port())), ["both"]),
                 ("read-only folder", {"LOOKHAVEN_HOME": "/proc/lookhaven"}, ["/proc/lookhaven", "LOOKHAVEN_HOME"]),
+                ("no network", {"LOOKHAVEN_TRUSTED_PROXIES": "192.0.2.1,proxy;"}, ["proxy;", "LOOKHAVEN_TRUSTED_PROXIES"]),
                 ("folder that is a file", {"LOOKHAVEN_HOME": str(file)}, [str(file), "LOOKHAVEN_HOME"]),
                 ("folder too long for a socket", {"LOOKHAVEN_HOME": f"{folder}/{'a' * 90}"}, ["too long"]),
                 ("folder with a quote", {"LOOKHAVEN_HOME": f'{folder}/a"b'}, ['a"b', "LOOKHAVEN_HOME"]),

@@ -108,6 +108,11 @@ TEST_F(CliTest, AFileOfSettingsIsRightOrSaysInWhichLineItIsNot) {
         {"LOOKHAVEN_PORT=443\n", 78, "line 1: LOOKHAVEN_PORT must be a number from 1024"},
         {"LOOKHAVEN_PORT\n", 78, "must be a number"},
         {"LOOKHAVEN_PORT=8443\n", 78, "are both 8443"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=192.0.2.1, 10.0.0.0/8,2001:db8::/64\n", 0, "are valid"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=\n", 0, "are valid"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=192.0.2.1,proxy\n", 78, "line 1: proxy is neither an address nor a network"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=10.0.0.0/33\n", 78, "10.0.0.0/33 is neither"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=10.0.0.1;\n", 78, "10.0.0.1; is neither"},
     };
     for (const auto& [text, code, has] : rows) {
         base::WriteFileAtomically(file, text);
