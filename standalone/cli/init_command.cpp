@@ -7,6 +7,7 @@
 #include <system_error>
 
 #include "standalone/admin/mount_claim.h"
+#include "standalone/base/log.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
@@ -98,10 +99,20 @@ void RenewMarkers(store::Store& store) {
     }
 }
 
+// Without room for it the upgrade goes on all the same: cameras wait to be recorded.
+void CopyOlderStore(const base::Installation& installation) {
+    try {
+        store::Store::CopyIfOlder(installation.StoreUrl(), installation.OlderStoreFile());
+    } catch (const store::StoreError& error) {
+        base::LogError(Concat("there is no way back to the version before this upgrade: ", error.what()));
+    }
+}
+
 void Init(const Console& console, const Request& request) {
     console.BecomeOwner();
     const std::string& admin = request.admin;
     const base::Installation installation = CreateFolders(console.HomePath());
+    CopyOlderStore(installation);
     const int steps = store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
     const bool mount_added = AddDefaultMount(store, installation);

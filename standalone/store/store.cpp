@@ -8,6 +8,7 @@
 #include <utility>
 
 #include <fcntl.h>
+#include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/store/connection.h"
@@ -156,6 +157,33 @@ int Store::Migrate(const std::string& url) {
         SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;
     });
+}
+
+bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& file) {
+    const StoreAddress address = StoreAddress::Parse(url);
+    if (address.engine != Engine::kSqlite || !std::filesystem::exists(address.location)) {
+        return false;
+    }
+    Connection connection(address);
+    const int version = ReadVersion(connection);
+    if (version == 0 || version >= SchemaVersion()) {
+        return false;
+    }
+    const std::string copy = file.string() + ".new";
+    try {
+        // SQLite fills an empty file only.
+        const base::FileDescriptor output = base::OpenFile(copy, O_WRONLY | O_CREAT | O_TRUNC, 0600);
+        connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy); });
+        if (::fsync(output.Get()) != 0) {
+            base::ThrowErrno("cannot write " + copy);
+        }
+        std::filesystem::rename(copy, file);
+    } catch (const std::exception& error) {
+        std::error_code ignored;
+        std::filesystem::remove(copy, ignored);
+        throw StoreError(std::string("cannot copy the record store: ") + error.what());
+    }
+    return true;
 }
 
 std::vector<std::string> Store::Check() {

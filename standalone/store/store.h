@@ -12,6 +12,7 @@
 // See           cameras.h, events.h, users.h and the other headers of this folder: a class for each kind of record.
 #pragma once
 
+#include <filesystem>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -75,6 +76,11 @@ class Store {
     // Brings the store to this program's schema, from nothing or from any older version, in one transaction; returns
     // the number of steps taken, 0 when there was nothing to do. A new SQLite file is private to its owner.
     static int Migrate(const std::string& url);
+
+    // Copies a SQLite store that an older program made to the file, which it replaces and keeps private: the way back to
+    // that program, after Migrate. False, with nothing done, for any other store: PostgreSQL's is its operator's to back
+    // up. Throws StoreError, and leaves the file as it was.
+    static bool CopyIfOlder(const std::string& url, const std::filesystem::path& file);
 
     // The schema version this program needs.
     static int SchemaVersion();

@@ -65,7 +65,18 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
           "update counters set value = 4 where name = 'camera'"}) {
         Force(statement);
     }
+    const std::filesystem::path copy = folder_ / "before";
+    const bool is_copied = GetParam() == Engine::kSqlite;
+    EXPECT_EQ(Store::CopyIfOlder(url_, copy), is_copied);
     EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
+    EXPECT_FALSE(Store::CopyIfOlder(url_, copy)) << "it is not older any more";
+    if (is_copied) {
+        EXPECT_EQ(std::filesystem::status(copy).permissions() & std::filesystem::perms(0777),
+                  std::filesystem::perms(0600));
+        EXPECT_EQ(Store::Migrate("sqlite:" + copy.string()), Store::SchemaVersion() - 1) << "the copy is as old";
+        Store store = Store::Open("sqlite:" + copy.string());
+        EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
+    }
     Store store = Store::Open(url_);
     EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
     EXPECT_TRUE(Cameras(store).Find(4)->insecure) << "it was recorded with any certificate";
