@@ -2,7 +2,6 @@
 #include "standalone/admin/change.h"
 
 #include <charconv>
-#include <memory>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/json_text.h"
@@ -76,13 +75,6 @@ void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen)
     if (seen && *seen != record["revision"].asInt64()) {
         throw Stale(record);
     }
-}
-
-Json::Value FromText(const std::string& text) {
-    Json::Value value;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
-    return value;
 }
 
 }  // namespace lookhaven::admin

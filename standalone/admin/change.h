@@ -64,7 +64,4 @@ class StillNeeded : public std::runtime_error {
 // Apply.
 void RequireCurrent(const Json::Value& record, std::optional<std::int64_t> seen);
 
-// A record as base::OneLineJson wrote it, into the audit log for one; null for an empty text.
-Json::Value FromText(const std::string& text);
-
 }  // namespace lookhaven::admin

@@ -23,7 +23,7 @@ constexpr const char* kInvitationSetting = "pairing_invitation";
 
 // The one that is valid. Throws InvalidInvitation.
 Json::Value FindInvitation(store::Store& store, const base::BootTime& now) {
-    Json::Value invitation = FromText(store::Settings(store).Find(kInvitationSetting).value_or(""));
+    Json::Value invitation = base::ParseOneLineJson(store::Settings(store).Find(kInvitationSetting).value_or(""));
     if (!invitation.isObject() || invitation["boot"] != now.boot ||
         now.seconds - invitation["given"].asInt64() >= kInvitationLifetimeS) {
         Refuse();
@@ -77,7 +77,7 @@ std::string Invite(store::Store& store, const Actor& actor, const std::string& n
 
 void VoidInvitationOf(store::Store& store, int user_id) {
     store::Settings settings(store);
-    const Json::Value invitation = FromText(settings.Find(kInvitationSetting).value_or(""));
+    const Json::Value invitation = base::ParseOneLineJson(settings.Find(kInvitationSetting).value_or(""));
     if (invitation.isObject() && invitation["user"] == user_id) {
         settings.Set(kInvitationSetting, "");
     }

@@ -16,7 +16,7 @@ namespace {
 constexpr std::size_t kMaxNameBytes = 64;
 
 Json::Value FromStored(const std::string& text) {
-    Json::Value preferences = FromText(text);
+    Json::Value preferences = base::ParseOneLineJson(text);
     return preferences.isObject() ? preferences : Json::Value(Json::objectValue);
 }
 

@@ -24,7 +24,7 @@ constexpr std::array kSettings = {
     Setting{"players_per_session", Kind::kNumber, 9, 1, 16, "recorded events that one session may play side by side"},
     Setting{"marks_per_day", Kind::kNumber, store::kMarksPerDay, 1, 1'000'000,
             "alerts and POS transactions that one account may report within 24 hours"},
-    Setting{kCentralManagement, Kind::kSwitch, 0, 0, 1, "central management: this host manages its recording servers"},
+    Setting{kCentralManagement, Kind::kSwitch, 0, 0, 1, "central management: cameras of paired hosts are shown here"},
     Setting{store::kMountFoldersSetting, Kind::kFolders, 0, 0, 0,
             "folders below which managers may add mounts in the browser"},
     Setting{store::kMonitorTokenSetting, Kind::kToken, 0, 0, 0,

@@ -135,8 +135,8 @@ std::string Audit(const Call& call) {
         json["address"] = entry.address;
         json["action"] = entry.action;
         json["object"] = entry.object;
-        json["before"] = admin::FromText(entry.before);
-        json["after"] = admin::FromText(entry.after);
+        json["before"] = base::ParseOneLineJson(entry.before);
+        json["after"] = base::ParseOneLineJson(entry.after);
     }
     return SuccessAnswer(data);
 }

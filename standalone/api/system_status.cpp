@@ -62,7 +62,7 @@ Json::Value CheckRecord(const char* name, const doctor::JobResult& result) {
     using enum doctor::JobResult::State;
     Json::Value json;
     if (result.state == kDone) {
-        json = admin::FromText(result.text);
+        json = base::ParseOneLineJson(result.text);
         json["unchecked"] = Json::Value();
     } else {
         json["ok"] = Json::Value();
@@ -93,7 +93,7 @@ Json::Value SystemStatus(const Call& call) {
     jobs.emplace_back([&] { return base::OneLineJson(admin::CurrentCertificate(installation)); });
     call.context.CloseRecords();  // it must not be shared with other processes
     std::vector<doctor::JobResult> results = doctor::RunApart(jobs, kLimit);
-    data["certificate"] = admin::FromText(results.back().text);
+    data["certificate"] = base::ParseOneLineJson(results.back().text);
     data["check"] = Json::arrayValue;
     for (std::size_t i = 0; i < doctor::Checks().size(); ++i) {
         data["check"].append(CheckRecord(doctor::Checks()[i].name, results[i]));

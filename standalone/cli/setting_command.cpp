@@ -92,7 +92,7 @@ void AddSetting(CLI::App& program, const Console& console) {
                 .Option("value", set.request().value, "", Required, Satisfies(CLI::Range(setting.min, setting.max)));
         }
     }
-    set.Add("cms", "Central management: whether this host manages its recording servers", SetCms)
+    set.Add("cms", "Central management: whether cameras of paired hosts are shown here", SetCms)
         .Option("value", set.request().word, "on or off", Required, Satisfies(CLI::IsMember({"on", "off"})));
     set.Add(store::kMountFoldersSetting,
             "Folders below which managers may add mounts in the browser, such as /mnt:/media", SetMountFolders)

@@ -26,7 +26,7 @@ export interface CameraHistory {
   coverage: { interval: number; runs: Runs } | null;
 }
 
-export interface Group {
+export interface CameraGroup {
   id: number;
   name: string;
   /** Those that the user may play back. */
@@ -154,7 +154,7 @@ export class Recordings {
     return event.map((one) => footageOf(one, one.camera_id));
   }
 
-  async groups(): Promise<Group[]> {
+  async groups(): Promise<CameraGroup[]> {
     type RawGroup = { id: number; name: string; camera: number[]; live: number[] };
     const answer = await this.#server.call<{ group: RawGroup[] }>("VEXO.Catalog", "Groups", {});
     return answer.group.map(({ id, name, camera, live }) => ({ id, name, cameras: camera, live }));

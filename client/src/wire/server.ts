@@ -4,6 +4,7 @@
 
 import { Alerts } from "./alerts";
 import { Deadline } from "./deadline";
+import { sentenceOf } from "./sentence";
 import { SignalLosses } from "./signal_losses";
 import { postFile, type UploadOptions } from "./upload";
 
@@ -79,11 +80,6 @@ interface CallOptions {
 
 interface Failure {
   error?: { code?: number; message?: string; data?: unknown };
-}
-
-/** "try again in a moment": "Try again in a moment." */
-function sentenceOf(words: string): string {
-  return `${words.charAt(0).toUpperCase()}${words.slice(1).replace(/\.$/, "")}.`;
 }
 
 function sentenceFor(status: number, serverMessage: string | undefined): string {

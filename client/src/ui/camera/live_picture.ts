@@ -5,6 +5,7 @@
 import { Feed } from "../../live/feed";
 import type { SignalState } from "../../live/signal_state";
 import type { Unplayable } from "../../live/unplayable";
+import { capitalized } from "../../wire/sentence";
 import type { SignalLoss } from "../../wire/signal_losses";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -117,7 +118,7 @@ export class LivePicture {
     const state = this.state();
     const isThere = state.kind !== "unavailable" && state.kind !== "absent";
     const sentence = isThere ? signalText(state) : state.reason;
-    setText(this.#sentence, sentence.charAt(0).toUpperCase() + sentence.slice(1));
+    setText(this.#sentence, capitalized(sentence));
     const noStills = "The server has no still pictures of this camera.";
     setText(this.#reason, state.kind === "lost" ? state.reason : state.kind === "unavailable" ? noStills : "");
     this.#showHint(isThere ? this.#unplayable() : null);

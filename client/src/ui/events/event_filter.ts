@@ -5,7 +5,7 @@
 import { kEventKinds, kindOf, type EventKind } from "../../playback/coverage";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
-import type { Group } from "../../wire/recordings";
+import type { CameraGroup } from "../../wire/recordings";
 import type { Camera } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -100,7 +100,7 @@ export class EventFilter {
     this.#showCameras();
   }
 
-  setGroups(groups: readonly Group[]): void {
+  setGroups(groups: readonly CameraGroup[]): void {
     const all = { name: "All", cameras: this.#cameras.map(({ id }) => id) };
     this.#groupRow.replaceChildren(
       ...[all, ...groups].map(({ name, cameras }) => {

@@ -3,7 +3,7 @@
 // The wall: the live pictures of all cameras.
 
 import { missingDecoder } from "../../live/unplayable";
-import { Recordings, type Group } from "../../wire/recordings";
+import { Recordings, type CameraGroup } from "../../wire/recordings";
 import { kVideoTypeMjpeg, ServerError, type Camera, type CameraList } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { unplayableHint } from "../camera/unplayable_hint";
@@ -37,7 +37,7 @@ export class WallScreen extends Screen {
   /** All of the account. */
   #cameras: Camera[] | null = null;
   /** Null until they are known. */
-  #groups: Group[] | null = null;
+  #groups: CameraGroup[] | null = null;
   /** The group that the address named last: it stays under a camera that is open. */
   #group: number | null = openGroup();
   /** Why the list of cameras is not up to date; empty when it is. */

@@ -3,6 +3,7 @@
 // The page of one record, or of a new one: its form, what stands above and below that, and the way back to the list of
 // all. Cameras, accounts and mounts differ in their fields, and in how they are saved.
 
+import { capitalized } from "../../wire/sentence";
 import { settingsAddress, type SettingsSection } from "../screens/route";
 import { button } from "../widgets/button";
 import type { IconName } from "../widgets/icons";
@@ -48,7 +49,7 @@ export abstract class RecordPage<
 
   constructor(context: PageContext, id: number | "new", kind: RecordKind<Settings, Stored>) {
     const { noun, aNoun, section } = kind;
-    super(context, id === "new" ? `Add ${aNoun}` : `${noun.charAt(0).toUpperCase()}${noun.slice(1)}`);
+    super(context, id === "new" ? `Add ${aNoun}` : capitalized(noun));
     this.linkBack(`All ${noun}s`, settingsAddress(section));
     this.#kind = kind;
     this.#id = id;

@@ -2,7 +2,7 @@
 //
 // Links to the wall of all cameras and of each camera group that has some of them. Nothing where there are no groups.
 
-import type { Group } from "../../wire/recordings";
+import type { CameraGroup } from "../../wire/recordings";
 import { groupAddress } from "../screens/route";
 import { element } from "../widgets/dom";
 
@@ -11,7 +11,7 @@ export class GroupTabs {
   #shown = "";
 
   /** `open` is the id of the group that is shown; null: all cameras. */
-  show(groups: readonly Group[], open: number | null): void {
+  show(groups: readonly CameraGroup[], open: number | null): void {
     const shown = JSON.stringify([groups, open]);
     if (shown === this.#shown) return;
     this.#shown = shown;

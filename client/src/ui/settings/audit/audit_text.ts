@@ -3,6 +3,7 @@
 // Entries of the audit log in words.
 
 import type { AuditedState, AuditEntry } from "../../../wire/audit";
+import { capitalized } from "../../../wire/sentence";
 import { yesNo } from "../../widgets/text";
 import { weekText } from "../cameras/plan";
 
@@ -28,7 +29,7 @@ export function actionText(action: string): string {
   const [area = "", verb = ""] = action.split(".");
   const words = (text: string) => text.replaceAll(/[-_]/g, " ").replaceAll(/([a-z])([A-Z])/g, "$1 $2").toLowerCase();
   const what = kAreas[area] ?? words(area);
-  return `${what.charAt(0).toUpperCase()}${what.slice(1)} ${kVerbs[verb] ?? words(verb)}`.trim();
+  return `${capitalized(what)} ${kVerbs[verb] ?? words(verb)}`.trim();
 }
 
 export interface AuditedChange {

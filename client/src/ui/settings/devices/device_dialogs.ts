@@ -7,7 +7,7 @@ import type { DeviceKind, DeviceRecord, Devices, DeviceSettings } from "../../..
 import { element } from "../../widgets/dom";
 import { radioField, textField } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
-import { Seen } from "../seen";
+import { SeenRecord } from "../seen_record";
 import { cameraField } from "./camera_field";
 import { PortsField } from "./ports_field";
 
@@ -35,7 +35,7 @@ export function askToChange(
   cameras: readonly Named[],
 ): Promise<boolean> {
   const fields = new DeviceFields(cameras, device);
-  const seen = new Seen(device, "Save");
+  const seen = new SeenRecord(device, "Save");
   fields.showFor(device.kind);
   return openDialog(host, {
     title: `Change ${device.name}`,
@@ -47,7 +47,7 @@ export function askToChange(
 }
 
 export function askToRemove(host: HTMLElement, devices: Devices, device: DeviceRecord): Promise<boolean> {
-  const seen = new Seen(device, "Remove");
+  const seen = new SeenRecord(device, "Remove");
   const stays = device.kind === "door" ? "It stays on its maps, without a state." : "It is no longer shown on its maps.";
   return openDialog(host, {
     title: `Remove ${device.name}?`,

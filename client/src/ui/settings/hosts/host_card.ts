@@ -3,6 +3,7 @@
 // One host: where it is, whether it answers, and its cameras.
 
 import type { HostRecord } from "../../../wire/hosts";
+import { sentenceOf } from "../../../wire/sentence";
 import { counted } from "../../widgets/amounts";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
@@ -32,7 +33,7 @@ export function hostCard(record: HostRecord, onRemove: () => void): HostCard {
       if (!enabled) return;
       state.textContent = reason ? "does not answer" : "answers";
       state.className = reason ? "record-trouble" : "quiet";
-      trouble.textContent = reason ? `${reason.charAt(0).toUpperCase()}${reason.slice(1)}.` : "";
+      trouble.textContent = reason ? sentenceOf(reason) : "";
       trouble.hidden = reason === "";
     },
   };

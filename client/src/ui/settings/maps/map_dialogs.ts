@@ -8,7 +8,7 @@ import { counted } from "../../widgets/amounts";
 import { element } from "../../widgets/dom";
 import { fileField, textField } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
-import { Seen } from "../seen";
+import { SeenRecord } from "../seen_record";
 import { kPictureFiles, nameOfFile, pictureOfFile } from "./picture_file";
 
 const kPictureHint = "PNG, JPEG, WebP or SVG, at most 20 MB. Nothing but the picture itself is kept of the file.";
@@ -24,7 +24,7 @@ export function askToAdd(host: HTMLElement, setup: EmapSetup): Promise<boolean> 
 }
 
 export function askToReplace(host: HTMLElement, setup: EmapSetup, map: EmapRecord): Promise<boolean> {
-  const seen = new Seen(map, "Replace");
+  const seen = new SeenRecord(map, "Replace");
   const hint =
     "What is placed on the map stays where it is, counted in pixels: look at it if the new picture has another size.";
   const content = map.items > 0 ? [element("p", {}, hint)] : [];
@@ -37,7 +37,7 @@ export function askToReplace(host: HTMLElement, setup: EmapSetup, map: EmapRecor
 
 export function askToRename(host: HTMLElement, setup: EmapSetup, map: EmapRecord): Promise<boolean> {
   const name = textField("Name", { maxlength: "64" });
-  const seen = new Seen(map, "Rename");
+  const seen = new SeenRecord(map, "Rename");
   name.value = map.name;
   return openDialog(host, {
     title: `Rename ${map.name}`,
@@ -51,7 +51,7 @@ export function askToRename(host: HTMLElement, setup: EmapSetup, map: EmapRecord
 }
 
 export function askToRemove(host: HTMLElement, setup: EmapSetup, map: EmapRecord): Promise<boolean> {
-  const seen = new Seen(map, "Remove");
+  const seen = new SeenRecord(map, "Remove");
   return openDialog(host, {
     title: `Remove ${map.name}?`,
     content: removalSentences(map).map((sentence) => element("p", {}, sentence)),

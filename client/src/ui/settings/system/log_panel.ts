@@ -10,7 +10,7 @@ import { formPart, selectField, type Field } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
 import { LoadedPart } from "../loaded_part";
-import { Seen } from "../seen";
+import { SeenRecord } from "../seen_record";
 
 const kNames: Record<string, string> = { liveview: "Live view", player: "Players", others: "Everything else" };
 const kHint = "Messages of this level and more severe ones are logged. Levels hold at once, and until they are changed.";
@@ -48,7 +48,7 @@ export class LogPanel {
       field.value = level;
       return [name, field];
     });
-    const seen = new Seen({ ...levels, name: "the log levels" }, "Save");
+    const seen = new SeenRecord({ ...levels, name: "the log levels" }, "Save");
     const isDone = await openDialog(this.root, {
       title: kTitle,
       content: [element("p", { class: "form-hint" }, kHint), ...fields.map(([, field]) => field.root)],

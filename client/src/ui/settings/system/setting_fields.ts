@@ -2,6 +2,7 @@
 //
 // What holds for the whole installation, as fields: a number with its bounds, or a switch.
 
+import { sentenceOf } from "../../../wire/sentence";
 import type { SettingRecord } from "../../../wire/system";
 import { checkField, formPart, numberField, type Field } from "../../widgets/fields";
 import type { FormFields } from "../record_form";
@@ -23,7 +24,7 @@ export function settingLabel(name: string): string {
 }
 
 function hintOf({ meaning, initial, min, max, kind }: SettingRecord): string {
-  const sentence = `${meaning.charAt(0).toUpperCase()}${meaning.slice(1)}.`;
+  const sentence = sentenceOf(meaning);
   return kind === "number" ? `${sentence} From ${min} to ${max}, initially ${initial}.` : sentence;
 }
 

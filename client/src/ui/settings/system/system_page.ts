@@ -2,6 +2,7 @@
 //
 // The installation as a whole: its health, its parts, its certificate, and what holds for all of it.
 
+import { sentenceOf } from "../../../wire/sentence";
 import { asServerError, ServerError } from "../../../wire/server";
 import { System, type SettingRecord } from "../../../wire/system";
 import { settingsAddress } from "../../screens/route";
@@ -135,7 +136,7 @@ function operatorsSetting({ name, value, meaning }: SettingRecord): HTMLElement 
     "div",
     { class: "form-field" },
     element("p", {}, element("strong", {}, settingLabel(name)), `: ${text}`),
-    element("p", { class: "form-hint" }, `${meaning.charAt(0).toUpperCase()}${meaning.slice(1)}. Changed with:`),
+    element("p", { class: "form-hint" }, `${sentenceOf(meaning)} Changed with:`),
     ...(command ? [copyable(command)] : []),
   );
 }

@@ -5,7 +5,7 @@
 import { asServerError } from "../../wire/server";
 import type { Revised } from "./record_form";
 
-export class Seen<Stored extends Revised & { name: string }> {
+export class SeenRecord<Stored extends Revised & { name: string }> {
   readonly #submit: string;
   #record: Stored;
 
