@@ -12,22 +12,20 @@ namespace lookhaven::cli {
 
 namespace {
 
-// Neither a link nor somebody else's, through which it would be read.
+// What a failed attempt left.
 bool IsOwnEmptyFile(const struct stat& found) {
-    return S_ISREG(found.st_mode) && found.st_size == 0 && found.st_uid == ::geteuid() && found.st_nlink == 1;
+    return S_ISREG(found.st_mode) && found.st_size == 0 && found.st_uid == ::geteuid();
 }
 
 }  // namespace
 
 std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write) {
     struct stat found {};
-    if (::lstat(file.c_str(), &found) == 0 && !IsOwnEmptyFile(found)) {
+    if (::lstat(file.c_str(), &found) == 0 && (!IsOwnEmptyFile(found) || ::unlink(file.c_str()) != 0)) {
         throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
     }
-    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0600);
-    if (::fstat(output.Get(), &found) != 0 || !IsOwnEmptyFile(found) || ::fchmod(output.Get(), 0600) != 0) {
-        throw Failure(kCannotCreate, "another program makes the file ", file, ": name another one");
-    }
+    // A new one, which nobody has open.
+    const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
     try {
         write(output.Get());
         if (::fsync(output.Get()) != 0 || ::fstat(output.Get(), &found) != 0) {

@@ -11,9 +11,9 @@ namespace lookhaven::cli {
 
 // Makes a file that only its owner may read, and has the function write it to the borrowed descriptor; returns once it
 // is on the disk: how many bytes that are. Made at once, as whoever runs the command: the function may change to the
-// installation's owner, who may not write there, so opening the store belongs into it. When this throws, what the
-// function throws or std::system_error, it leaves no file behind, or where it is not its to remove any more an empty one,
-// which the next attempt takes. Throws Failure where there is another file already.
+// installation's owner, who may not write there, so opening the store belongs into it. When the function throws, or the
+// file cannot be written (std::system_error), it leaves none behind, or, where removing it is not allowed any more, an
+// empty one, which the next attempt takes. Throws Failure where there is another file already.
 std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write);
 
 }  // namespace lookhaven::cli
