@@ -24,8 +24,6 @@ class Installation {
     static void CreateFolders(const std::filesystem::path& home);
 
     const std::filesystem::path& Home() const { return home_; }
-    // The store as it was before the last upgrade, where that changed its schema.
-    std::filesystem::path OlderStoreFile() const { return home_ / "lookhaven.db.before-upgrade"; }
     std::filesystem::path RunFolder() const { return home_ / "run"; }
     std::filesystem::path LogFolder() const { return home_ / "log"; }
     std::filesystem::path TlsFolder() const { return home_ / "tls"; }

@@ -102,7 +102,7 @@ void RenewMarkers(store::Store& store) {
 // Without room for it the upgrade goes on all the same: cameras wait to be recorded.
 void CopyOlderStore(const base::Installation& installation) {
     try {
-        store::Store::CopyIfOlder(installation.StoreUrl(), installation.OlderStoreFile());
+        store::Store::CopyIfOlder(installation.StoreUrl(), installation.Home());
     } catch (const store::StoreError& error) {
         base::LogError(Concat("there is no way back to the version before this upgrade: ", error.what()));
     }

@@ -10,24 +10,14 @@
 
 namespace lookhaven::cli {
 
-namespace {
-
-// What a failed attempt left.
-bool IsOwnEmptyFile(const struct stat& found) {
-    return S_ISREG(found.st_mode) && found.st_size == 0 && found.st_uid == ::geteuid();
-}
-
-}  // namespace
-
 std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write) {
-    struct stat found {};
-    if (::lstat(file.c_str(), &found) == 0 && (!IsOwnEmptyFile(found) || ::unlink(file.c_str()) != 0)) {
+    if (::faccessat(AT_FDCWD, file.c_str(), F_OK, AT_SYMLINK_NOFOLLOW) == 0) {
         throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
     }
-    // A new one, which nobody has open.
     const base::FileDescriptor output = base::OpenFile(file, O_RDWR | O_CREAT | O_EXCL, 0600);
     try {
         write(output.Get());
+        struct stat found {};
         if (::fsync(output.Get()) != 0 || ::fstat(output.Get(), &found) != 0) {
             base::ThrowErrno("cannot write " + file);
         }

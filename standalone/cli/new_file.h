@@ -13,7 +13,7 @@ namespace lookhaven::cli {
 // is on the disk: how many bytes that are. Made at once, as whoever runs the command: the function may change to the
 // installation's owner, who may not write there, so opening the store belongs into it. When the function throws, or the
 // file cannot be written (std::system_error), it leaves none behind, or, where removing it is not allowed any more, an
-// empty one, which the next attempt takes. Throws Failure where there is another file already.
+// empty one. Throws Failure where there is a file already, even an empty one: another command may be about to fill it.
 std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write);
 
 }  // namespace lookhaven::cli

@@ -68,7 +68,7 @@ bool IsNetwork(std::string_view text) {
     const int prefix_bits = ::inet_pton(AF_INET, address.c_str(), bytes.data()) == 1    ? 32
                             : ::inet_pton(AF_INET6, address.c_str(), bytes.data()) == 1 ? 128
                                                                                         : -1;
-    return prefix_bits > 0 && (slash == text.size() || IsNumber(text.substr(slash + 1), 0, prefix_bits));
+    return prefix_bits > 0 && (slash == text.size() || IsNumber(text.substr(slash + 1), 1, prefix_bits));
 }
 
 // The first of the words that is no network; empty when all are.

@@ -159,7 +159,7 @@ int Store::Migrate(const std::string& url) {
     });
 }
 
-bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& file) {
+bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder) {
     const StoreAddress address = StoreAddress::Parse(url);
     if (address.engine != Engine::kSqlite || !std::filesystem::exists(address.location)) {
         return false;
@@ -169,11 +169,22 @@ bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& fil
     if (version == 0 || version >= SchemaVersion()) {
         return false;
     }
+    const std::filesystem::path file = folder / ("lookhaven.db.schema-" + std::to_string(version));
     const std::string copy = file.string() + ".new";
     try {
+        if (std::filesystem::space(folder).available < 3 * std::filesystem::file_size(address.location)) {
+            throw StoreError("there is no room for it beside an upgrade");
+        }
         // SQLite fills an empty file only.
-        const base::FileDescriptor output = base::OpenFile(copy, O_WRONLY | O_CREAT | O_TRUNC, 0600);
+        const base::FileDescriptor output = base::OpenFile(copy, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW, 0600);
         connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy); });
+        {
+            Connection copied({Engine::kSqlite, copy});
+            if (ReadVersion(copied) != version) {
+                throw StoreError("another program is upgrading it");
+            }
+            copied.Execute("delete from sessions");
+        }
         if (::fsync(output.Get()) != 0) {
             base::ThrowErrno("cannot write " + copy);
         }

@@ -77,10 +77,11 @@ class Store {
     // the number of steps taken, 0 when there was nothing to do. A new SQLite file is private to its owner.
     static int Migrate(const std::string& url);
 
-    // Copies a SQLite store that an older program made to the file, which it replaces and keeps private: the way back to
-    // that program, after Migrate. False, with nothing done, for any other store: PostgreSQL's is its operator's to back
-    // up. Throws StoreError, and leaves the file as it was.
-    static bool CopyIfOlder(const std::string& url, const std::filesystem::path& file);
+    // Copies a SQLite store that an older program made, without its sessions, to the private file
+    // lookhaven.db.schema-<its version> in the folder, which it replaces: the way back to that program, after Migrate.
+    // False, with nothing done, for any other store: PostgreSQL's is its operator's to back up. Throws StoreError, also
+    // where Migrate would then lack room, and leaves the file as it was.
+    static bool CopyIfOlder(const std::string& url, const std::filesystem::path& folder);
 
     // The schema version this program needs.
     static int SchemaVersion();

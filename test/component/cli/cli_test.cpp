@@ -112,6 +112,7 @@ TEST_F(CliTest, AFileOfSettingsIsRightOrSaysInWhichLineItIsNot) {
         {"LOOKHAVEN_TRUSTED_PROXIES=\n", 0, "are valid"},
         {"LOOKHAVEN_TRUSTED_PROXIES=192.0.2.1,proxy\n", 78, "line 1: proxy is neither an address nor a network"},
         {"LOOKHAVEN_TRUSTED_PROXIES=10.0.0.0/33\n", 78, "10.0.0.0/33 is neither"},
+        {"LOOKHAVEN_TRUSTED_PROXIES=::/0\n", 78, "::/0 is neither"},
         {"LOOKHAVEN_TRUSTED_PROXIES=10.0.0.1;\n", 78, "10.0.0.1; is neither"},
     };
     for (const auto& [text, code, has] : rows) {
@@ -268,8 +269,9 @@ TEST_F(DemoTest, RootMakesFilesWhereTheInstallationsOwnerMayNot) {
           {"emap export 1 " + place + "/map", 73, "already a file"},
           {"emap export 1 " + place + "/link", 73, "already a file"},
           {"export 1 --from -1h " + failed, 66, "nothing of these cameras"},
-          {"event export 999 " + failed, 66, "999"},
-          {"emap export 1 " + failed, 0, "Wrote e-map"}});
+          {"event export 999 " + failed + "2", 66, "999"},
+          {"emap export 1 " + failed, 73, "already a file"}});
+    EXPECT_TRUE(std::filesystem::is_empty(failed)) << "no part of anything is left";
     EXPECT_FALSE(std::filesystem::exists(folder_ / "elsewhere"));
 }
 

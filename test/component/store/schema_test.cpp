@@ -65,11 +65,12 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
           "update counters set value = 4 where name = 'camera'"}) {
         Force(statement);
     }
-    const std::filesystem::path copy = folder_ / "before";
+    const std::filesystem::path copy = folder_ / "lookhaven.db.schema-1";
+    Force("insert into sessions values ('x', 'h', 1, 5, 5, 9)");
     const bool is_copied = GetParam() == Engine::kSqlite;
-    EXPECT_EQ(Store::CopyIfOlder(url_, copy), is_copied);
+    EXPECT_EQ(Store::CopyIfOlder(url_, folder_), is_copied);
     EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
-    EXPECT_FALSE(Store::CopyIfOlder(url_, copy)) << "it is not older any more";
+    EXPECT_FALSE(Store::CopyIfOlder(url_, folder_)) << "it is not older any more";
     if (is_copied) {
         EXPECT_EQ(std::filesystem::status(copy).permissions() & std::filesystem::perms(0777),
                   std::filesystem::perms(0600));
