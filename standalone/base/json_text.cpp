@@ -14,8 +14,8 @@ std::string OneLineJson(const Json::Value& value) {
 Json::Value ParseOneLineJson(const std::string& text) {
     Json::Value value;
     const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
-    return value;
+    const bool is_json = reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
+    return is_json ? value : Json::Value();
 }
 
 std::string IndentedJson(const Json::Value& value) {

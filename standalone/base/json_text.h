@@ -12,7 +12,7 @@ namespace lookhaven::base {
 // Without spaces or line breaks, in ASCII alone; the same text for equal values.
 std::string OneLineJson(const Json::Value& value);
 
-// What OneLineJson wrote; null for an empty text.
+// What OneLineJson wrote; null for an empty or any other text.
 Json::Value ParseOneLineJson(const std::string& text);
 
 // For people: a member in each line, indented by two spaces, in UTF-8. Ends without a line break.

@@ -216,7 +216,7 @@ std::filesystem::path RequireFile(store::Store& store, const Request& request) {
     return file;
 }
 
-void CopyTo(int output, const Console& console, const Request& request) {
+void ExportTo(int output, const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const std::int64_t now = base::WallSeconds();
     media::ExportOptions options;
@@ -236,10 +236,10 @@ void CopyTo(int output, const Console& console, const Request& request) {
 
 void Export(const Console& console, const Request& request) {
     if (request.file == "-") {
-        CopyTo(STDOUT_FILENO, console, request);
+        ExportTo(STDOUT_FILENO, console, request);
         return;
     }
-    const Json::Int64 size_bytes = WriteNewFile(request.file, [&](int output) { CopyTo(output, console, request); });
+    const Json::Int64 size_bytes = WriteNewFile(request.file, [&](int output) { ExportTo(output, console, request); });
     console.Answer(Object("id", request.id, "file", request.file, "size_bytes", size_bytes), "Event ", request.id,
                    " was exported to ", request.file, ".");
 }

@@ -9,11 +9,12 @@
 
 namespace lookhaven::cli {
 
-// Makes a file that only its owner may read, and has the function write it to the borrowed descriptor; returns once it
-// is on the disk: how many bytes that are. Made at once, as whoever runs the command: the function may change to the
-// installation's owner, who may not write there, so opening the store belongs into it. When the function throws, or the
+// Makes a file that only its owner may read, and has the function write it to the borrowed descriptor; returns its size
+// in bytes once it is on the disk. Made at once, as whoever runs the command: the function may change to the
+// installation's owner, who may not write there, so opening the store belongs in it. When the function throws, or the
 // file cannot be written (std::system_error), it leaves none behind, or, where removing it is not allowed any more, an
-// empty one. Throws Failure where there is a file already, even an empty one: another command may be about to fill it.
+// empty one. Throws Failure where there is a file already, even an empty one: another command may be about to fill
+// it.
 std::int64_t WriteNewFile(const std::string& file, const std::function<void(int descriptor)>& write);
 
 }  // namespace lookhaven::cli

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
@@ -86,6 +87,26 @@ void PrepareFile(const StoreAddress& address) {
     }
 }
 
+// A private, empty file, which is what SQLite fills, and nothing beside it of an attempt that was cut off. Removed unless
+// it was renamed.
+struct PartialCopy {
+    explicit PartialCopy(std::string where)
+        : path(std::move(where)),
+          file((Remove(), base::OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, 0600))) {}
+    PartialCopy(const PartialCopy&) = delete;
+    PartialCopy& operator=(const PartialCopy&) = delete;
+    ~PartialCopy() { Remove(); }
+
+    void Remove() const {
+        for (const char* suffix : {"", "-journal", "-wal", "-shm"}) {
+            ::unlink((path + suffix).c_str());
+        }
+    }
+
+    const std::string path;
+    const base::FileDescriptor file;
+};
+
 int TakeSteps(const Connection& connection, soci::session& sql, int version) {
     if (version == 0) {
         sql << "create table schema_version (version integer not null)";
@@ -159,42 +180,44 @@ int Store::Migrate(const std::string& url) {
     });
 }
 
-bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder) {
+bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder) try {
     const StoreAddress address = StoreAddress::Parse(url);
     if (address.engine != Engine::kSqlite || !std::filesystem::exists(address.location)) {
         return false;
+    }
+    // One program at a time.
+    const base::FileDescriptor place = base::OpenFile(folder, O_RDONLY | O_DIRECTORY);
+    if (::flock(place.Get(), LOCK_EX) != 0) {
+        base::ThrowErrno("cannot lock " + folder.string());
     }
     Connection connection(address);
     const int version = ReadVersion(connection);
     if (version == 0 || version >= SchemaVersion()) {
         return false;
     }
+    if (std::filesystem::space(folder).available < 3 * std::filesystem::file_size(address.location)) {
+        throw StoreError("there is no room for it beside an upgrade");
+    }
     const std::filesystem::path file = folder / ("lookhaven.db.schema-" + std::to_string(version));
-    const std::string copy = file.string() + ".new";
-    try {
-        if (std::filesystem::space(folder).available < 3 * std::filesystem::file_size(address.location)) {
-            throw StoreError("there is no room for it beside an upgrade");
+    const PartialCopy copy(file.string() + ".new");
+    connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy.path); });
+    {
+        Connection copied({Engine::kSqlite, copy.path});
+        if (ReadVersion(copied) != version) {
+            throw StoreError("another program is upgrading it");
         }
-        // SQLite fills an empty file only.
-        const base::FileDescriptor output = base::OpenFile(copy, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW, 0600);
-        connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy); });
-        {
-            Connection copied({Engine::kSqlite, copy});
-            if (ReadVersion(copied) != version) {
-                throw StoreError("another program is upgrading it");
-            }
-            copied.Execute("delete from sessions");
-        }
-        if (::fsync(output.Get()) != 0) {
-            base::ThrowErrno("cannot write " + copy);
-        }
-        std::filesystem::rename(copy, file);
-    } catch (const std::exception& error) {
-        std::error_code ignored;
-        std::filesystem::remove(copy, ignored);
-        throw StoreError(std::string("cannot copy the record store: ") + error.what());
+        copied.Execute("delete from sessions");
+    }
+    if (::fsync(copy.file.Get()) != 0) {
+        base::ThrowErrno("cannot write " + copy.path);
+    }
+    std::filesystem::rename(copy.path, file);
+    if (::fsync(place.Get()) != 0) {
+        base::ThrowErrno("cannot write " + folder.string());
     }
     return true;
+} catch (const std::exception& error) {
+    throw StoreError(std::string("the record store was not copied: ") + error.what());
 }
 
 std::vector<std::string> Store::Check() {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The server's messages, which begin without a capital, as sentences.
+// Words and messages, which begin without a capital, as headings and sentences.
 
 export function capitalized(text: string): string {
   return text.charAt(0).toUpperCase() + text.slice(1);

@@ -11,6 +11,7 @@
 #include "standalone/store/marks.h"
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/schema.h"
+#include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 #include "test/component/store/store_fixture.h"
@@ -68,15 +69,21 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
     const std::filesystem::path copy = folder_ / "lookhaven.db.schema-1";
     Force("insert into sessions values ('x', 'h', 1, 5, 5, 9)");
     const bool is_copied = GetParam() == Engine::kSqlite;
+    const std::filesystem::path cut_off = copy.string() + ".new";
+    std::ofstream(cut_off) << "half of a copy";
+    std::ofstream(cut_off.string() + "-wal") << "half of a log";
     EXPECT_EQ(Store::CopyIfOlder(url_, folder_), is_copied);
     EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
     EXPECT_FALSE(Store::CopyIfOlder(url_, folder_)) << "it is not older any more";
     if (is_copied) {
+        EXPECT_FALSE(std::filesystem::exists(cut_off));
+        EXPECT_FALSE(std::filesystem::exists(cut_off.string() + "-wal"));
         EXPECT_EQ(std::filesystem::status(copy).permissions() & std::filesystem::perms(0777),
                   std::filesystem::perms(0600));
         EXPECT_EQ(Store::Migrate("sqlite:" + copy.string()), Store::SchemaVersion() - 1) << "the copy is as old";
         Store store = Store::Open("sqlite:" + copy.string());
         EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
+        EXPECT_THAT(Sessions(store).OfUser(1, 5), IsEmpty());
     }
     Store store = Store::Open(url_);
     EXPECT_EQ(Cameras(store).Find(4)->name, "Gate");
