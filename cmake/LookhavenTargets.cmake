@@ -43,13 +43,13 @@ if(LOOKHAVEN_TESTS AND LOOKHAVEN_SANITIZE)
     target_precompile_headers(lookhaven_test_headers PRIVATE <gmock/gmock.h> <gtest/gtest.h>)
 endif()
 
-# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE] [BY_SUITE]): a
+# lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE] [BY_SUITE] [LONG]): a
 # GoogleTest program. ctest runs each case as "<name>.<suite>.<case>" in a process of its own, under the given label (unit,
 # component, system). Those of one program run one after the other, for they may share segments and files of the machine.
 # ALONE: not beside any others, for it looks at times. BY_SUITE: one process per suite, for cases that share an expensive
-# set-up.
+# set-up. LONG: begun first, so that the others run beside it.
 function(lookhaven_test name label)
-    cmake_parse_arguments(arg "ALONE;BY_SUITE" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
+    cmake_parse_arguments(arg "ALONE;BY_SUITE;LONG" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
     target_link_libraries(${name} PRIVATE lookhaven_options ${arg_LIBRARIES} GTest::gmock GTest::gtest GTest::gtest_main)
     if(TARGET lookhaven_test_headers)
@@ -62,6 +62,9 @@ function(lookhaven_test name label)
         endif()
     endif()
     set(properties LABELS ${label} TIMEOUT ${arg_TIMEOUT} RUN_SERIAL ${arg_ALONE} RESOURCE_LOCK ${name})
+    if(arg_LONG)
+        list(APPEND properties COST 100)
+    endif()
     if(arg_BY_SUITE)
         set(entries ${CMAKE_CURRENT_BINARY_DIR}/${name}_suites.cmake)
         file(GENERATE OUTPUT ${entries} CONTENT "set(name ${name})\nset(program \"$<TARGET_FILE:${name}>\")

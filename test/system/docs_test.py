@@ -10,7 +10,7 @@ import tempfile
 import time
 import unittest
 
-from installation import PASSWORDS, ROOT, Installation, call, make_certificate, recorded_events
+from installation import PASSWORDS, ROOT, Installation, call, make_certificate, recorded_events, wait_until
 from parts import Parts
 
 # For a file that an example names: one pixel.
@@ -64,6 +64,8 @@ class DocsTest(unittest.TestCase):
         ran = 0
         with Installation(LOOKHAVEN_DEMO_FOOTAGE="yes") as server:
             known = words(server)
+            states = call("VEXO.Catalog", "CameraStates")
+            wait_until(lambda: server.request(states, "admin").json["data"]["camera"], 10, "the recorder tells of its cameras")
             with open(server.home / "log/recorder.log", "a") as log:
                 log.write("2026-03-01T08:15:30.123Z recorder[812] error: an example\n")
             for page in sorted((ROOT / "docs/api").glob("*.md")):

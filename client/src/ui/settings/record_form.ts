@@ -47,6 +47,8 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
   readonly #message = element("p", { class: "form-message", role: "alert" });
   readonly #submit: HTMLButtonElement;
   readonly #conflict = element("div", { class: "form-conflict-place" });
+  /** Asked for while it was being saved. */
+  #isToBeSavedAgain = false;
   /** What the changes are made from. */
   #base: Stored | null;
   #initial: Settings;
@@ -90,7 +92,11 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
   }
 
   async #save(): Promise<void> {
-    if (this.#submit.getAttribute("aria-busy") === "true") return;
+    if (this.#submit.getAttribute("aria-busy") === "true") {
+      this.#isToBeSavedAgain = true;
+      return;
+    }
+    this.#isToBeSavedAgain = false;
     const settings = this.#fields.value;
     const invalid = [...this.root.elements].find((field) => field instanceof HTMLInputElement && !field.validity.valid);
     const problem = this.#fields.problem(settings) || (invalid ? "Please check the marked field." : "");
@@ -112,6 +118,7 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
     } finally {
       this.#submit.removeAttribute("aria-busy");
     }
+    if (this.#isToBeSavedAgain && this.isChanged) await this.#save();
   }
 
   #take(stored: Stored): void {

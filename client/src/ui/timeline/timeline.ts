@@ -9,7 +9,7 @@ import { midnight, type RecordedDays } from "../../playback/recorded_days";
 import { describe, type Footage, type FootageRef } from "../../wire/footage";
 import { element } from "../widgets/dom";
 import { OncePerFrame } from "../widgets/once_per_frame";
-import { panZoomByWheel, PanZoomPointers, type PanZoomActions } from "../widgets/pan_zoom";
+import { panZoomByWheel, PanZoomPointers, type PanZoomActions, type Point } from "../widgets/pan_zoom";
 import { clockTime, duration, shortDate } from "../widgets/text";
 import { SpanHandles, type Span } from "./span_handles";
 import { TimelineScrubber, type ScrubActions } from "./timeline_scrubber";
@@ -67,6 +67,8 @@ export class Timeline {
   readonly #names = element("div", { class: "timeline-names" });
   readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
   readonly #hint: TimelineHint;
+  /** Where a mouse is, or was last before it rested. */
+  #hovering: Point | null = null;
   readonly #scrubber: TimelineScrubber;
   readonly #handles = new SpanHandles(this.#drawn, (span) => this.#actions.choose(span));
   readonly #pointers: PanZoomPointers;
@@ -89,7 +91,7 @@ export class Timeline {
     this.#hint = new TimelineHint(this.#drawn, this.root);
     this.#resized.observe(this.#drawn);
     const scrub = (atMs: number) => {
-      this.#hint.hide();
+      this.#hideHint();
       actions.scrub(atMs);
     };
     const scrubbing = { scrub, release: actions.release };
@@ -102,9 +104,12 @@ export class Timeline {
     panZoomByWheel(this.#canvas, panZoom);
     this.#pointers = new PanZoomPointers(this.#canvas, panZoom, "x");
     this.#canvas.addEventListener("click", (event) => this.#click(event));
-    this.#canvas.addEventListener("pointerdown", () => this.#hint.hide());
-    this.#canvas.addEventListener("pointermove", (event) => this.#pointers.isPressed || this.#showHint(event));
-    this.#canvas.addEventListener("pointerleave", () => this.#hint.hide());
+    this.#canvas.addEventListener("pointerdown", () => this.#hideHint());
+    this.#canvas.addEventListener("pointermove", (event) => {
+      if (this.#pointers.isPressed || event.pointerType === "touch") return;
+      this.#showHint({ x: event.offsetX, y: event.offsetY });
+    });
+    this.#canvas.addEventListener("pointerleave", () => this.#hideHint());
     this.#canvas.addEventListener("keydown", (event) => this.#pressKey(event));
   }
 
@@ -229,6 +234,8 @@ export class Timeline {
       };
       paintLane(context, scale, colours, content, index * lanePx, lanePx, this.#selected);
     });
+    // What was recorded there may have come to be known just now.
+    if (this.#hovering && !this.#hint.hasStill) this.#showHint(this.#hovering);
     if (this.#playheadMs === null) return;
     const x = scale.xOf(this.#playheadMs);
     paintPlayhead(context, x, heightPx, colours);
@@ -262,14 +269,21 @@ export class Timeline {
     };
   }
 
-  #showHint({ offsetX: x, offsetY: y, pointerType }: PointerEvent): void {
+  #hideHint(): void {
+    this.#hovering = null;
+    this.#hint.hide();
+  }
+
+  #showHint(point: Point): void {
+    const { x, y } = point;
     const camera = this.#laneAt(y);
-    if (camera === undefined || pointerType === "touch") return this.#hint.hide();
+    if (camera === undefined) return this.#hideHint();
+    this.#hovering = point;
     const atMs = this.#scale.msAt(x);
     const { event, mark } = this.#footageAt(camera, x);
     const about = mark ? describe(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";
     const still = event?.isSaved ? this.#actions.stillAddress(event, atMs, kHintStillPx) : "";
-    this.#hint.show({ x, y }, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`, still);
+    this.#hint.show(point, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`, still);
   }
 
   #pressKey(event: KeyboardEvent): void {

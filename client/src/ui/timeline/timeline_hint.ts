@@ -27,6 +27,10 @@ export class TimelineHint {
     around.append(this.#hint);
   }
 
+  get hasStill(): boolean {
+    return this.#still !== null;
+  }
+
   /** `still` is the address of the picture; empty where there is none. */
   show({ x }: Point, text: string, still: string): void {
     this.#line.hidden = this.#hint.hidden = false;
