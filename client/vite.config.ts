@@ -19,5 +19,6 @@ export default defineConfig({
     include: ["**/*.test.ts"],
     // The tests stand outside the folder of node_modules and could not import "vitest" by name.
     globals: true,
+    setupFiles: ["../test/client/support/patience.ts"],
   },
 });

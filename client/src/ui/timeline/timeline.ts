@@ -67,8 +67,6 @@ export class Timeline {
   readonly #names = element("div", { class: "timeline-names" });
   readonly #drawn = element("div", { class: "timeline-drawn" }, this.#canvas);
   readonly #hint: TimelineHint;
-  /** Where a mouse is, or was last before it rested. */
-  #hovering: Point | null = null;
   readonly #scrubber: TimelineScrubber;
   readonly #handles = new SpanHandles(this.#drawn, (span) => this.#actions.choose(span));
   readonly #pointers: PanZoomPointers;
@@ -91,7 +89,7 @@ export class Timeline {
     this.#hint = new TimelineHint(this.#drawn, this.root);
     this.#resized.observe(this.#drawn);
     const scrub = (atMs: number) => {
-      this.#hideHint();
+      this.#hint.hide();
       actions.scrub(atMs);
     };
     const scrubbing = { scrub, release: actions.release };
@@ -104,12 +102,12 @@ export class Timeline {
     panZoomByWheel(this.#canvas, panZoom);
     this.#pointers = new PanZoomPointers(this.#canvas, panZoom, "x");
     this.#canvas.addEventListener("click", (event) => this.#click(event));
-    this.#canvas.addEventListener("pointerdown", () => this.#hideHint());
+    this.#canvas.addEventListener("pointerdown", () => this.#hint.hide());
     this.#canvas.addEventListener("pointermove", (event) => {
       if (this.#pointers.isPressed || event.pointerType === "touch") return;
       this.#showHint({ x: event.offsetX, y: event.offsetY });
     });
-    this.#canvas.addEventListener("pointerleave", () => this.#hideHint());
+    this.#canvas.addEventListener("pointerleave", () => this.#hint.hide());
     this.#canvas.addEventListener("keydown", (event) => this.#pressKey(event));
   }
 
@@ -235,7 +233,7 @@ export class Timeline {
       paintLane(context, scale, colours, content, index * lanePx, lanePx, this.#selected);
     });
     // What was recorded there may have come to be known just now.
-    if (this.#hovering && !this.#hint.hasStill) this.#showHint(this.#hovering);
+    if (this.#hint.withoutStill) this.#showHint(this.#hint.withoutStill);
     if (this.#playheadMs === null) return;
     const x = scale.xOf(this.#playheadMs);
     paintPlayhead(context, x, heightPx, colours);
@@ -269,16 +267,10 @@ export class Timeline {
     };
   }
 
-  #hideHint(): void {
-    this.#hovering = null;
-    this.#hint.hide();
-  }
-
   #showHint(point: Point): void {
     const { x, y } = point;
     const camera = this.#laneAt(y);
-    if (camera === undefined) return this.#hideHint();
-    this.#hovering = point;
+    if (camera === undefined) return this.#hint.hide();
     const atMs = this.#scale.msAt(x);
     const { event, mark } = this.#footageAt(camera, x);
     const about = mark ? describe(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";

@@ -19,6 +19,7 @@ export class TimelineHint {
   readonly #box: HTMLElement;
   #still: HTMLImageElement | null = null;
   #address = "";
+  #shownAt: Point | null = null;
 
   /** Adds the line to `box`, and what it says to `around`, which may be larger. */
   constructor(box: HTMLElement, around: HTMLElement) {
@@ -27,12 +28,15 @@ export class TimelineHint {
     around.append(this.#hint);
   }
 
-  get hasStill(): boolean {
-    return this.#still !== null;
+  /** Where it is shown and has no picture; null otherwise. */
+  get withoutStill(): Point | null {
+    return this.#still ? null : this.#shownAt;
   }
 
   /** `still` is the address of the picture; empty where there is none. */
-  show({ x }: Point, text: string, still: string): void {
+  show(point: Point, text: string, still: string): void {
+    const { x } = point;
+    this.#shownAt = point;
     this.#line.hidden = this.#hint.hidden = false;
     setText(this.#text, text);
     this.#hint.classList.toggle("at-right", x > this.#box.clientWidth - kMaxWidthPx);
@@ -41,6 +45,7 @@ export class TimelineHint {
   }
 
   hide(): void {
+    this.#shownAt = null;
     this.#line.hidden = this.#hint.hidden = true;
     this.#showStill("");
   }
