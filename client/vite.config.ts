@@ -19,6 +19,8 @@ export default defineConfig({
     include: ["**/*.test.ts"],
     // The tests stand outside the folder of node_modules and could not import "vitest" by name.
     globals: true,
+    // For a busy machine.
+    testTimeout: 20_000,
     setupFiles: ["../test/client/support/patience.ts"],
   },
 });

@@ -110,7 +110,7 @@ export class Overview {
     if (document.hidden || this.#cameras.length === 0) return;
     const { startMs, endMs } = this.timeline.scale;
     if (!this.timeline.showsEvents) this.#days.load(this.#loaded, startMs, endMs);
-    else void this.cache.load(this.#loaded, startMs / 1000, endMs / 1000, true);
+    else void this.cache.load(this.#loaded, startMs / 1000, endMs / 1000, true).then(() => this.#showFootage());
     // Asks again for days that the server did not answer for.
     this.calendar.refresh();
     this.#showFootage();
@@ -166,7 +166,7 @@ export class Overview {
     const recorded = this.#chosen
       .flatMap((camera) => this.cache.get(camera, fromS, toS).footage)
       .filter((one) => one.stop >= fromS && one.start < toS);
-    const isKnown = this.#cameras.length > 0 && !this.cache.isBusy;
+    const isKnown = this.#cameras.length > 0 && !this.cache.isBusy && !this.cache.error;
     const whyNone = isKnown ? whyNoEvents(this.filter, recorded.length, this.calendar) : "";
     listEvents(this.list, this.filter, recorded, span, whyNone);
   }
