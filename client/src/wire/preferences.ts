@@ -7,6 +7,8 @@
 //               server that fails holds nobody up: a session without what was preferred is better than none.
 //               What belongs to one browser alone stays there: notifications (alert_notifications). Sound and full
 //               screen take a click each time, without which browsers allow neither.
+//               Records, named saved.…, are another matter: whoever saves one must know whether the server took it,
+//               and those of other tabs and browsers are to be seen.
 // Invariants    (1) Only what was changed here is told, by name: what another tab changes stays.
 //               (2) It is told for the account that was asked for: once somebody else has logged in in another tab,
 //                   the server refuses it.
@@ -18,6 +20,7 @@ const kApi = "VEXO.User";
 const kTimeoutMs = 5_000;
 /** What changes in quick succession is told at once. */
 const kSettleMs = 1_000;
+const kRecord = /^saved\./;
 
 type Values = Record<string, unknown>;
 
@@ -31,6 +34,7 @@ export class Preferences {
   #settling: ReturnType<typeof setTimeout> | undefined;
   #telling: Promise<void> = Promise.resolve();
   #isTelling = false;
+  #saving: Promise<void> = Promise.resolve();
   readonly #closing = new AbortController();
 
   private constructor(server: Server, user: number, values: Values) {
@@ -63,6 +67,32 @@ export class Preferences {
     this.#values[name] = this.#changes[name] = value;
     clearTimeout(this.#settling);
     this.#settling = setTimeout(() => void this.flush(), kSettleMs);
+  }
+
+  /** The names of all that was chosen or saved. */
+  get names(): string[] {
+    return Object.keys(this.#values);
+  }
+
+  /**
+   * Tells these records at once, null for one to remove, and has them, and those of other tabs, once the server does.
+   * Rejects with a ServerError where it does not: then nothing has changed here. None overtakes another.
+   */
+  save(records: Values): Promise<void> {
+    const saved = this.#saving.then(async () => {
+      const json = { id: this.#user, preferences: records };
+      const how = { json, timeoutMs: kTimeoutMs, signal: this.#closing.signal };
+      const answer = await this.#server.call<{ preferences?: Values } | null>(kApi, "SetPreferences", {}, how);
+      this.#takeRecords(answer?.preferences ?? { ...this.#values, ...records });
+    });
+    this.#saving = saved.catch(() => undefined);
+    return saved;
+  }
+
+  /** Has the records of other tabs and browsers as well. Never rejects: without an answer all stays as it is. */
+  refresh(): Promise<void> {
+    // Asked for in this way, none of another account are given.
+    return this.save({}).catch(() => undefined);
   }
 
   /** Begins at once unless it is being told already: none overtakes another. Resolves when done; never rejects. */
@@ -99,6 +129,13 @@ export class Preferences {
       this.#isTelling = false;
     }
     if (this.#takesOver) forgetKeptByBrowser();
+  }
+
+  #takeRecords(values: Values): void {
+    for (const name of this.names) if (kRecord.test(name)) delete this.#values[name];
+    for (const [name, value] of Object.entries(values)) {
+      if (kRecord.test(name) && value !== null) this.#values[name] = value;
+    }
   }
 
   #takeOver(): void {

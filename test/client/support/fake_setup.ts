@@ -113,7 +113,9 @@ export class FakeSetup {
   #setPreferences(request: Request): Answer {
     const { id, preferences } = request as unknown as { id: number; preferences: Record<string, unknown> };
     if (id !== this.userId) return failed(403, "these are another account's preferences");
-    const merged = { ...this.preferences.get(id), ...preferences };
+    const all = Object.entries({ ...this.preferences.get(id), ...preferences });
+    const merged = Object.fromEntries(all.filter(([, value]) => value !== null));
+    if (JSON.stringify(merged).length > 16_384) return failed(400, "the preferences of an account have at most 16384 bytes");
     this.preferences.set(id, merged);
     return ok({ preferences: merged });
   }

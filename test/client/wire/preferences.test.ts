@@ -33,7 +33,10 @@ beforeEach(() => {
     if (address.endsWith("=Preferences")) return status === 200 ? answer(200, { preferences: stored }) : answer(status, null);
     told.push({ json: JSON.parse(String(body)) as { id: number; preferences: Values }, keepalive });
     if (status === 0) throw new TypeError("Failed to fetch");
-    return answer(status, {});
+    if (status !== 200) return answer(status, null);
+    const all = Object.entries({ ...stored, ...told.at(-1)!.json.preferences });
+    stored = Object.fromEntries(all.filter(([, value]) => value !== null));
+    return answer(200, { preferences: stored });
   });
 });
 
@@ -125,4 +128,41 @@ test("after the session nothing is told any more", async () => {
   page.dispatchEvent(new Event("pagehide"));
   await vi.advanceTimersByTimeAsync(5_000);
   expect(told).toEqual([]);
+});
+
+test("a record is told at once and is there when the server has it, as are those of other tabs, but not their choices", async () => {
+  stored = { "saved.a": 1, "saved.b": 1, "wall.layout": "2" };
+  const preferences = await load();
+  stored = { "saved.a": 2, "saved.c": 1, "wall.layout": "3" };
+  preferences.set("wall.layout", "4");
+  const saved = preferences.save({ "saved.d": 1, "saved.c": null });
+  expect(preferences.get("saved.d")).toBeUndefined();
+  await saved;
+  const known = preferences.names.map((name) => [name, preferences.get(name)]);
+  expect(Object.fromEntries(known)).toEqual({ "saved.a": 2, "saved.d": 1, "wall.layout": "4" });
+  expect(toldValues()).toEqual([{ "saved.d": 1, "saved.c": null }]);
+  await preferences.flush();
+  expect(toldValues().slice(1), "what was chosen is not lost meanwhile").toEqual([{ "wall.layout": "4" }]);
+});
+
+test.each([0, 400, 401, 403, 503])("a record that the server does not take (%i) is refused, and not told again", async (code) => {
+  const preferences = await load();
+  status = code;
+  await expect(preferences.save({ "saved.a": 1 })).rejects.toMatchObject({ status: code });
+  await preferences.refresh();
+  status = 200;
+  await preferences.save({ "saved.b": 1 });
+  await vi.advanceTimersByTimeAsync(5_000);
+  expect([preferences.names, toldValues()]).toEqual([["saved.b"], [{ "saved.a": 1 }, {}, { "saved.b": 1 }]]);
+});
+
+test.each<[string, string]>([
+  ["null", "null"],
+  ["no object", '{"preferences":7}'],
+  ["another prototype", '{"preferences":{"__proto__":{"saved.x":1},"saved.a":null}}'],
+])("an answer that is %s is no way into the page", async (_what, data) => {
+  const preferences = await load();
+  vi.stubGlobal("fetch", async () => new Response(`{"success":true,"data":${data}}`));
+  await preferences.refresh();
+  expect([preferences.names, preferences.get("saved.x")]).toEqual([[], undefined]);
 });
