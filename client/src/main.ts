@@ -19,7 +19,7 @@
 //   ui/        app goes from screen to screen
 //     screens/    what fills the window: login, first account (setup), wall, events, maps, settings; what they have in
 //                 common (screen), and their addresses (route)
-//     wall/       the grid of tiles and its layouts
+//     wall/       the grid of tiles and its layouts; those that are saved, sequences of them, and their menu
 //     camera/     one camera live: its picture, the large view, snapshots
 //     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events
 //     timeline/   the lanes of recordings
@@ -42,6 +42,7 @@ import "./style/login.css";
 import "./style/setup.css";
 import "./style/picture.css";
 import "./style/wall.css";
+import "./style/wall_menu.css";
 import "./style/large.css";
 import "./style/snapshot.css";
 import "./style/dialog.css";

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall, or of it the
-// cameras of one group, #group=3; #events, and what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
+// cameras of one group, #group=3, of a saved layout, #layout=1f0c, or of a sequence of these, #sequence=1f0c; #events,
+// and what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
 // #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
 // with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
 // one-time token.
@@ -19,6 +20,7 @@ export type SettingsSection = (typeof kSettingsSections)[number];
 
 const kCameraPattern = /^#camera=(\d+)$/;
 const kGroupPattern = /^#group=(\d+)$/;
+const kSavedPattern = /^#(layout|sequence)=([\w-]{1,40})$/;
 const kEventsPattern = /^#(events|(event|alert|pos)=\d+)(&|$)/;
 const kSettingsPattern = /^#settings(?:=([a-z]+)(?:&open=(\d+|new))?)?$/;
 const kMapPattern = /^#map=(\d+)(?:&camera=(\d+)(?:@(\d+))?|(&edit))?$/;
@@ -91,14 +93,30 @@ export function openCamera(): number | null {
   return found ? Number(found[1]) : null;
 }
 
-/** The group whose cameras the wall shows; null: those of all. */
-export function openGroup(): number | null {
-  const found = kGroupPattern.exec(location.hash);
-  return found ? Number(found[1]) : null;
+/** What the wall shows: one of these, or all cameras. */
+export interface OpenWall {
+  group: number | null;
+  /** Ids of what the account has saved. */
+  layout: string | null;
+  sequence: string | null;
+}
+
+export function openWall(): OpenWall {
+  const group = kGroupPattern.exec(location.hash)?.[1];
+  const [, kind, id] = kSavedPattern.exec(location.hash) ?? [];
+  return {
+    group: group === undefined ? null : Number(group),
+    layout: kind === "layout" ? id! : null,
+    sequence: kind === "sequence" ? id! : null,
+  };
 }
 
 export function groupAddress(id: number): string {
   return `#group=${id}`;
+}
+
+export function savedAddress(kind: "layout" | "sequence", id: string): string {
+  return `#${kind}=${id}`;
 }
 
 /** Opens a camera. Going from one camera to the next leaves one entry in the history, not one for each. */

@@ -111,9 +111,9 @@ export abstract class Screen {
 }
 
 /**
- * Keys, account and forms keep the screen's keys out, wherever a click has left the focus; a screen's own dialog does
+ * Keys, menus and forms keep the screen's keys out, wherever a click has left the focus; a screen's own dialog does
  * not.
  */
 function isCovered(): boolean {
-  return document.querySelector("dialog:is(.keys, .account-menu)[open]") !== null;
+  return document.querySelector("dialog:is(.keys, .account-menu, .wall-menu)[open]") !== null;
 }

@@ -1,22 +1,26 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The wall: the live pictures of all cameras.
+// The wall: the live pictures of all cameras, of a group, or of a saved layout.
 
 import { missingDecoder } from "../../live/unplayable";
-import { Recordings, type CameraGroup } from "../../wire/recordings";
+import { Recordings } from "../../wire/recordings";
 import { kVideoTypeMjpeg, ServerError, type Camera, type CameraList } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { unplayableHint } from "../camera/unplayable_hint";
 import type { AbsentCameras } from "../wall/absent_cameras";
 import { Grid } from "../wall/grid";
 import { GroupTabs } from "../wall/group_tabs";
-import { layoutPicker } from "../wall/layout_picker";
+import type { LayoutChoice } from "../wall/layout";
+import { LayoutPicker } from "../wall/layout_picker";
+import { SequenceBar } from "../wall/sequence_bar";
+import { WallContents } from "../wall/wall_contents";
+import { WallMenu } from "../wall/wall_menu";
 import { element, setText } from "../widgets/dom";
 import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
 import { keepTrying } from "./keep_trying";
-import { openCamera, openGroup, settingsAddress, showCamera, showWall } from "./route";
+import { openCamera, openWall, settingsAddress, showCamera, showWall } from "./route";
 import { Screen } from "./screen";
 import type { Session } from "./session";
 
@@ -34,12 +38,10 @@ export class WallScreen extends Screen {
   readonly #advice = element("p", { class: "wall-advice", role: "note", hidden: true });
   readonly #tabs = new GroupTabs();
   readonly #recordings: Recordings;
-  /** All of the account. */
-  #cameras: Camera[] | null = null;
-  /** Null until they are known. */
-  #groups: CameraGroup[] | null = null;
-  /** The group that the address named last: it stays under a camera that is open. */
-  #group: number | null = openGroup();
+  readonly #contents: WallContents;
+  readonly #picker = new LayoutPicker((choice) => this.#chooseGrid(choice));
+  readonly #sequence = new SequenceBar();
+  readonly #menu: WallMenu;
   /** Why the list of cameras is not up to date; empty when it is. */
   #error = "";
 
@@ -49,19 +51,35 @@ export class WallScreen extends Screen {
     this.#absent = session.remembered.absentCameras;
     const actions = { back: showWall, step: (by: 1 | -1) => this.#step(by) };
     this.#overlay = new CameraOverlay(this.server, this.root, this.front, actions);
-    this.#grid = new Grid(this.server, this.preferences, {
+    const changed = () => void (this.closed.aborted || this.#showTiles());
+    this.#contents = new WallContents(this.preferences, openWall(), changed);
+    const { arrangement, saved } = this.#contents;
+    this.#grid = new Grid(this.server, arrangement, {
       open: (camera) => showCamera(camera.id),
-      snapshot: (camera) => this.#overlay.takeSnapshot(camera),
+      snapshot: (camera) => this.#snapshot(camera),
       dismiss: ({ id }) => {
         this.#absent.dismiss(id);
         this.#showTiles();
       },
     });
-    const layouts = layoutPicker(this.preferences, (choice) => this.#grid.setLayout(choice));
-    this.addToBar(this.#status, layouts, fullScreenButton());
-    this.front.append(this.#tabs.root, this.#advice, this.#message, this.#grid.root);
+    this.#menu = new WallMenu(saved, {
+      wall: () => ({ grid: arrangement.grid, cameras: arrangement.idsOf(this.#contents.shown) }),
+      cameras: () => arrangement.inOrder(this.#contents.cameras ?? []),
+      open: () => this.#contents.open,
+      reopen: () => this.#contents.reopen(),
+    });
+    this.addToBar(this.#status, this.#picker.root, this.#menu.button, fullScreenButton());
+    this.front.append(this.#tabs.root, this.#sequence.root, this.#advice, this.#message, this.#grid.root);
+    this.root.append(this.#menu.root);
+    this.#picker.show(arrangement.grid);
+    // Whoever touches a tile wants to see more of what is there.
+    for (const type of ["pointerdown", "focusin"]) this.#grid.root.addEventListener(type, () => this.#pause());
     const loadUnlessHidden = () => void (document.hidden || this.#load());
-    document.addEventListener("visibilitychange", loadUnlessHidden, { signal: this.closed });
+    const followVisibility = () => {
+      this.#contents.isHidden = document.hidden;
+      loadUnlessHidden();
+    };
+    document.addEventListener("visibilitychange", followVisibility, { signal: this.closed });
     this.every(kListIntervalMs, loadUnlessHidden);
     this.every(kRefreshMs, () => this.#refresh());
     this.every(kSignalLossesIntervalMs, () => void (document.hidden || this.server.signalLosses.refresh()));
@@ -72,16 +90,15 @@ export class WallScreen extends Screen {
   override close(): void {
     super.close();
     this.#overlay.close();
+    this.#contents.close();
     this.#grid.close();
   }
 
   followRoute(): boolean {
-    if (openCamera() === null && openGroup() !== this.#group) {
-      this.#group = openGroup();
-      this.#showTiles();
-      this.#refresh();
-    }
-    const camera = this.#cameras?.find(({ id }) => id === openCamera()) ?? null;
+    // What is shown stays under a camera that is open.
+    if (openCamera() === null) this.#open();
+    else this.#pause();
+    const camera = this.#contents.cameras?.find(({ id }) => id === openCamera()) ?? null;
     const left = camera ? null : this.#overlay.camera;
     this.#overlay.show(camera, camera ? this.#grid.tile(camera.id)?.picture : undefined);
     if (left) this.#grid.tile(left.id)?.focus();
@@ -95,20 +112,34 @@ export class WallScreen extends Screen {
       ["Enter", "Open the camera large"],
       ["S", "Snapshot of the camera"],
       ["F", "Full screen"],
+      ["L", "Saved layouts and sequences"],
+      ["Space", "Pause the sequence, or go on"],
+      ["P N", "The sequence's layout before or after"],
     ];
   }
 
   protected pressKey(event: KeyboardEvent): boolean {
     const isDone = this.#overlay.pressKey(event);
     if (isDone !== undefined) return isDone;
-    if (event.key.toLowerCase() === "f") {
-      toggleFullScreen();
-      return true;
-    }
-    const camera = this.#grid.currentTile()?.camera;
-    if (event.key.toLowerCase() !== "s" || !camera) return false;
-    this.#overlay.takeSnapshot(camera);
+    const key = event.key.toLowerCase();
+    const { run } = this.#contents;
+    if (key === "f") toggleFullScreen();
+    else if (key === "l") void this.#menu.show();
+    else if (key === " " && run) this.#sequence.toggle();
+    else if ((key === "n" || key === "p") && run) run.step(key === "n" ? 1 : -1);
+    else return key === "s" && this.#takeSnapshot();
     return true;
+  }
+
+  #takeSnapshot(): boolean {
+    const camera = this.#grid.currentTile()?.camera;
+    if (camera) this.#snapshot(camera);
+    return camera !== undefined;
+  }
+
+  #snapshot(camera: Camera): void {
+    this.#pause();
+    this.#overlay.takeSnapshot(camera);
   }
 
   async #start(): Promise<void> {
@@ -125,7 +156,7 @@ export class WallScreen extends Screen {
 
   /** Brings the list up to date. */
   async #load(): Promise<void> {
-    if (!this.#cameras) return;
+    if (!this.#contents.cameras) return;
     const [list] = await Promise.all([
       this.server.cameras().catch((error: ServerError) => error),
       this.server.signalLosses.refresh(),
@@ -139,15 +170,16 @@ export class WallScreen extends Screen {
 
   /** Where they cannot be had, those of before stay: no camera is missed for it. */
   async #loadGroups(): Promise<void> {
-    this.#groups = await this.#recordings.groups().catch(() => this.#groups);
+    this.#contents.groups = await this.#recordings.groups().catch(() => this.#contents.groups);
   }
 
   #showList(list: CameraList): void {
-    this.#cameras = list.camera ?? [];
+    const cameras = list.camera ?? [];
+    this.#contents.cameras = cameras;
     this.#absent.update(list);
-    this.#showTiles();
-    if (this.#cameras.length + this.#absent.all.length === 0) this.#showWhyEmpty(list);
-    this.#showAdvice(this.#cameras.some(({ video_type }) => video_type !== kVideoTypeMjpeg));
+    this.#update();
+    if (cameras.length + this.#absent.all.length === 0) this.#showWhyEmpty(list);
+    this.#showAdvice(cameras.some(({ video_type }) => video_type !== kVideoTypeMjpeg));
     this.followRoute();
   }
 
@@ -157,29 +189,52 @@ export class WallScreen extends Screen {
     else this.#showMessage("camera", "You do not have permission to view any camera yet. Ask a manager for it.");
   }
 
+  /** Shows what the address names. */
+  #open(): void {
+    const [open, { group, layout, sequence }] = [openWall(), this.#contents.open];
+    if (open.group === group && open.layout === layout && open.sequence === sequence) return;
+    this.#contents.open = open;
+    this.#update();
+    // It may have been saved in another tab, and its link opened here.
+    const isThere = (open.layout === null && open.sequence === null) || this.#grid.size > 0;
+    if (!isThere) void this.#contents.saved.refresh();
+  }
+
+  /** Shows what cameras, groups, layouts and sequences are now. */
+  #update(): void {
+    this.#contents.update();
+    this.#showTiles();
+    this.#refresh();
+  }
+
   #showTiles(): void {
-    const absent = this.#absent.all.filter(({ camera }) => this.#isInGroup(camera));
-    this.#grid.setCameras(this.#shown, absent);
-    const listed = new Set([...(this.#cameras ?? []), ...this.#absent.all.map(({ camera }) => camera)].map(({ id }) => id));
-    const groups = (this.#groups ?? []).filter(({ id, live }) => id === this.#group || live.some((one) => listed.has(one)));
-    this.#tabs.show(groups, this.#group);
-    if (listed.size > 0) this.#showGroupMessage();
+    const { arrangement, cameras, groups, open, run, shown } = this.#contents;
+    this.#picker.show(arrangement.grid);
+    this.#grid.setLayout(arrangement.grid);
+    this.#grid.setCameras(shown, this.#absent.all.filter(({ camera }) => this.#contents.isShown(camera)));
+    const listed = new Set([...(cameras ?? []), ...this.#absent.all.map(({ camera }) => camera)].map(({ id }) => id));
+    const some = (groups ?? []).filter(({ id, live }) => id === open.group || live.some((one) => listed.has(one)));
+    const layout = open.layout === null ? null : arrangement.layout;
+    this.#tabs.show(some, open, layout ? `${layout.name}${arrangement.isChanged ? " (changed)" : ""}` : "");
+    this.#sequence.show(run);
+    this.#menu.update();
+    if (listed.size > 0) this.#showEmptyMessage();
   }
 
-  /** The cameras on the wall. */
-  get #shown(): Camera[] {
-    return (this.#cameras ?? []).filter((camera) => this.#isInGroup(camera));
+  #chooseGrid(choice: LayoutChoice): void {
+    this.#contents.arrangement.chooseGrid(choice);
+    this.#pause();
+    this.#showTiles();
   }
 
-  #isInGroup({ id }: Camera): boolean {
-    if (this.#group === null || this.#groups === null) return true;
-    return this.#groups.find((one) => one.id === this.#group)?.live.includes(id) ?? false;
+  #pause(): void {
+    if (this.#contents.run) this.#contents.run.isPaused = true;
   }
 
-  #showGroupMessage(): void {
+  #showEmptyMessage(): void {
     if (this.#grid.size > 0) return this.#message.replaceChildren();
     const all = element("a", { class: "button", href: "#" }, "Show all cameras");
-    this.#showMessage("camera", "This group has no cameras that you may watch.", all);
+    this.#showMessage("camera", this.#contents.whyEmpty, all);
   }
 
   /** Where the page came over plain HTTP, it can do less than over HTTPS. */
@@ -196,14 +251,15 @@ export class WallScreen extends Screen {
   #refresh(): void {
     const lost = this.#grid.refresh();
     this.#overlay.refresh();
-    const cameras = this.#shown.length;
+    const cameras = this.#contents.shown.length;
     const counted = `${cameras} ${cameras === 1 ? "camera" : "cameras"}${lost > 0 ? ` · ${lost} without signal` : ""}`;
-    setText(this.#status, this.#cameras === null ? "" : this.#error || counted);
+    setText(this.#status, this.#contents.cameras === null ? "" : this.#error || counted);
     this.#status.classList.toggle("alarm", this.#error !== "" || lost > 0);
   }
 
   #step(by: 1 | -1): void {
-    const cameras = this.#shown;
+    const { arrangement, shown } = this.#contents;
+    const cameras = arrangement.inOrder(shown);
     const at = cameras.findIndex(({ id }) => id === this.#overlay.camera?.id);
     const next = cameras[(at + by + cameras.length) % cameras.length];
     if (next) showCamera(next.id);

@@ -7,7 +7,6 @@
 //               (2) Never more tiles stream than the connection to the server carries.
 
 import { chooseStreams, streamLimit } from "../../live/stream_budget";
-import type { Preferences } from "../../wire/preferences";
 import { protocol } from "../../wire/protocol";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
@@ -15,7 +14,7 @@ import { element } from "../widgets/dom";
 import type { AbsentCamera } from "./absent_cameras";
 import { arrange, type LayoutChoice } from "./layout";
 import { Tile, type TileActions, type TileMode } from "./tile";
-import { dragToOrder, inOwnOrder, keepOrder } from "./tile_order";
+import { dragToOrder } from "./tile_drag";
 
 /** Scrolling past a tile must not open and close a stream. */
 const kSettleMs = 120;
@@ -32,10 +31,17 @@ const kSteps: Record<string, (columns: number) => number> = {
   ArrowDown: (columns) => columns,
 };
 
+/** Which order the tiles have, and who is told that the user has changed it. */
+export interface TileOrder {
+  inOrder(cameras: readonly Camera[]): Camera[];
+  /** `ids` are those of all tiles. */
+  moved(ids: readonly number[]): void;
+}
+
 export class Grid {
   readonly root = element("div", { class: "grid" });
   readonly #server: Server;
-  readonly #preferences: Preferences;
+  readonly #order: TileOrder;
   readonly #actions: TileActions;
   readonly #semaphore = new Semaphore(1);
   readonly #maxStreams: number;
@@ -53,9 +59,9 @@ export class Grid {
   /** The ids of tiles that cannot play a stream, as text to compare. */
   #unplayable = "";
 
-  constructor(server: Server, preferences: Preferences, actions: TileActions) {
+  constructor(server: Server, order: TileOrder, actions: TileActions) {
     this.#server = server;
-    this.#preferences = preferences;
+    this.#order = order;
     this.#actions = actions;
     this.#maxStreams = streamLimit(protocol());
     this.#observer = new IntersectionObserver((entries) => this.#onIntersection(entries), {
@@ -70,7 +76,7 @@ export class Grid {
 
   /** Shows these cameras, then those that are absent; tiles of cameras that stay play on without interruption. */
   setCameras(cameras: readonly Camera[], absent: readonly AbsentCamera[]): void {
-    const all = [...inOwnOrder(this.#preferences, cameras).map((camera) => ({ camera, reason: "" })), ...absent];
+    const all = [...this.#order.inOrder(cameras).map((camera) => ({ camera, reason: "" })), ...absent];
     const isUnchanged = (tile: Tile) => {
       return all.some(({ camera, reason }) => same(camera, tile.camera) && reason === tile.picture.absence);
     };
@@ -200,7 +206,7 @@ export class Grid {
   }
 
   #onMoved(): void {
-    keepOrder(this.#preferences, this.#inOrder().map(({ camera }) => camera.id));
+    this.#order.moved(this.#inOrder().map(({ camera }) => camera.id));
     this.#assignSoon();
   }
 }

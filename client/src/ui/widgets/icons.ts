@@ -63,6 +63,8 @@ const kShapes = {
   system: "M3 12h4l2.5-6.5 4.5 13 2.5-6.5H21",
   audit: "M12 20.5a8.5 8.5 0 1 0 0-17 8.5 8.5 0 0 0 0 17Z M12 7.5V12l3 2",
   grip: "M9 6h.01 M15 6h.01 M9 12h.01 M15 12h.01 M9 18h.01 M15 18h.01",
+  savedLayouts: "M8 7.5V4h12v12h-3.5 M4 8h12.5v12H4Z M10 8v12 M4 14h12.5",
+  overwrite: "M5.5 4H16l4 4v10.5a1.5 1.5 0 0 1-1.5 1.5h-13A1.5 1.5 0 0 1 4 18.5v-13A1.5 1.5 0 0 1 5.5 4Z M8 4v4.5h7V4 M7.5 20v-6.5h9V20",
   layoutAuto: "M4 4h9.5v16H4Z M17 4h3v5h-3Z M17 12.5h3V20h-3Z",
   layoutFirst: "M4 4h11v11H4Z M17.5 4H20v3h-2.5Z M17.5 10H20v5h-2.5Z M4 17.5h4V20H4Z M11 17.5h4V20h-4Z M17.5 17.5H20V20h-2.5Z",
   layout1: "M4 5h16v14H4Z",

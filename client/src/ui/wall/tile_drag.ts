@@ -1,32 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The user's own order of the tiles, kept for the next visit, and how the pointer changes it.
+// How the pointer changes the order of the tiles.
 
-import type { Preferences } from "../../wire/preferences";
-import type { Camera } from "../../wire/server";
-
-const kName = "wall.order";
 /** A pointer that moved less than this has clicked. */
 const kDragPx = 8;
-
-/** In the user's order; cameras that they never moved come after the others, as the server lists them. */
-export function inOwnOrder(preferences: Preferences, cameras: readonly Camera[]): Camera[] {
-  const order = preferredOrder(preferences);
-  const place = ({ id }: Camera) => (order.includes(id) ? order.indexOf(id) : order.length);
-  return [...cameras].sort((one, other) => place(one) - place(other));
-}
-
-/** `ids` may be some of the cameras: among those that are not shown now, they keep the places that they have. */
-export function keepOrder(preferences: Preferences, ids: readonly number[]): void {
-  const rest = [...ids];
-  const merged = preferredOrder(preferences).map((id) => (ids.includes(id) ? rest.shift()! : id));
-  preferences.set(kName, [...merged, ...rest]);
-}
-
-function preferredOrder(preferences: Preferences): number[] {
-  const preferred = preferences.get(kName);
-  return Array.isArray(preferred) ? preferred.filter((id): id is number => typeof id === "number") : [];
-}
 
 /**
  * Lets the mouse drag the children of `grid` to other places; a finger scrolls instead. `moved` is called when one is
