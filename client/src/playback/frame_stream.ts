@@ -9,6 +9,9 @@ import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
 import { ServerError } from "../wire/server";
 
+/** At rate 1 a frame comes at least every second; opening a stream takes longer where the server is busy. */
+export const kMaxSilenceMs = 8_000;
+
 export interface RecordedFrame {
   index: number;
   /** Unix milliseconds at which the camera's picture was taken in. */

@@ -16,6 +16,8 @@ export class ShownFrame {
   #positionMs = 0;
   /** Of the first frame of a run, which repeats nothing: when at the earliest it is due; null once it is shown. */
   #dueFromMs: number | null = null;
+  /** By performance.now(). */
+  #shownMs = 0;
 
   get index(): number {
     return this.#index;
@@ -29,6 +31,16 @@ export class ShownFrame {
   /** The same, but going on while the picture is repeated. */
   get positionMs(): number {
     return this.#positionMs;
+  }
+
+  /** How long ago it came, in milliseconds. */
+  get ageMs(): number {
+    return performance.now() - this.#shownMs;
+  }
+
+  /** Whether a frame was shown since `begin`. */
+  get hasBegun(): boolean {
+    return this.#dueFromMs === null;
   }
 
   /** Nothing of a recording is shown yet, of which that time was asked for. */
@@ -55,5 +67,6 @@ export class ShownFrame {
     this.#capturedMs = frame.capturedMs;
     this.#index = frame.index;
     this.#dueFromMs = null;
+    this.#shownMs = performance.now();
   }
 }

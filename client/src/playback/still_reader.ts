@@ -8,7 +8,7 @@
 import type { Footage } from "../wire/footage";
 import { newStreamKey, type FrameStart, type Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
-import { readFrames, type RecordedFrame } from "./frame_stream";
+import { kMaxSilenceMs, readFrames, type RecordedFrame } from "./frame_stream";
 
 export class StillReader {
   readonly #recordings: Recordings;
@@ -18,7 +18,7 @@ export class StillReader {
     this.#recordings = recordings;
   }
 
-  /** Call it before frames of another recording. */
+  /** What follows is elsewhere: the frames that are kept are of no use there. */
   forget(): void {
     this.#cached.clear();
   }
@@ -32,7 +32,6 @@ export class StillReader {
     start: FrameStart,
     show: (frame: RecordedFrame) => Promise<void>,
     signal: AbortSignal,
-    maxSilenceMs: number,
   ): Promise<void> {
     const cached = this.#cached.get(start.index);
     if (cached) return show(cached);
@@ -46,7 +45,7 @@ export class StillReader {
       isShown = true;
       return false;
     };
-    await readFrames(open, take, signal, maxSilenceMs);
+    await readFrames(open, take, signal, kMaxSilenceMs);
     if (!isShown && !signal.aborted) throw new ServerError(0, 0, "The connection was lost.");
   }
 }

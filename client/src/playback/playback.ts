@@ -1,0 +1,122 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Plays footage from a frame on to its end, in as many streams as that takes.
+//
+// Why so        The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That
+//               of a growing recording continues as it grows, and ends with it. Where the connection is lost, another
+//               stream goes on from the frame on the screen.
+
+import { delay } from "../wire/delay";
+import { newStreamKey, type Recordings } from "../wire/recordings";
+import { asServerError, ServerError } from "../wire/server";
+import { isPassing } from "./failure_reason";
+import { kMaxSilenceMs, readFrames, type RecordedFrame } from "./frame_stream";
+import type { OpenFootage } from "./open_footage";
+import { kMaxFrameMs, type ShownFrame } from "./shown_frame";
+import { streamEnd } from "./stream_end";
+
+const kTailDelayMs = 1_000;
+/** Between attempts to get a lost stream back. */
+const kRetryMs = 1_000;
+
+/** Where the frames go. */
+export interface PlaybackSink {
+  readonly shown: ShownFrame;
+  /** Shows a frame when it is due, or leaves it out; the next is fetched when that is done. */
+  take(frame: RecordedFrame): Promise<void>;
+  /** The connection was lost; it is tried again until it is back. */
+  lost(): void;
+  /** At the end of what is recorded so far, playback cannot be faster than the camera. */
+  slowedTo(rate: number): void;
+}
+
+export class Playback {
+  readonly #recordings: Recordings;
+  readonly #opened: OpenFootage;
+  readonly #sink: PlaybackSink;
+  #rate: number;
+  /** Of the stream that sends frames; 0 while none does. */
+  #key = 0;
+
+  constructor(recordings: Recordings, opened: OpenFootage, rate: number, sink: PlaybackSink) {
+    this.#recordings = recordings;
+    this.#opened = opened;
+    this.#rate = rate;
+    this.#sink = sink;
+  }
+
+  /**
+   * Plays to the end, or until another player of this session takes over. Rejects with a ServerError where it cannot go
+   * on; resolves with null when `signal` is aborted.
+   */
+  async run(from: number, signal: AbortSignal): Promise<"ended" | "preempted" | null> {
+    const { shown } = this.#sink;
+    while (!signal.aborted) {
+      const end = await this.#playStream(shown.hasBegun ? shown.index : from, signal);
+      if (end === "ended" || end === "preempted") return signal.aborted ? null : end;
+      if (end === "lost" && !signal.aborted) this.#sink.lost();
+      if (end === "lost") await delay(kRetryMs, signal);
+    }
+    return null;
+  }
+
+  /** Changes a running stream without interruption; rejects where the server cannot do that. */
+  async setRate(rate: number): Promise<void> {
+    this.#rate = rate;
+    if (this.#key !== 0) await this.#recordings.setRate(this.#key, rate);
+  }
+
+  async #playStream(from: number, signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
+    const { shown } = this.#sink;
+    try {
+      return (await this.#showFrames(from, signal)) ? "ended" : await this.#whatFollows(signal);
+    } catch (error) {
+      const failure = asServerError(error);
+      // A stream that has shown a picture can be had again.
+      if (shown.hasBegun && isPassing(failure)) return "lost";
+      throw failure;
+    } finally {
+      this.#key = 0;
+    }
+  }
+
+  /** Resolves with whether the last frame came; else the server ended the stream before. */
+  async #showFrames(from: number, signal: AbortSignal): Promise<boolean> {
+    const { footage } = this.#opened;
+    const extent = footage.isGrowing ? "growing" : "all";
+    const key = newStreamKey();
+    const rate = this.#rate;
+    let before = -1;
+    let isAtEnd = false;
+    await readFrames(
+      (until) => this.#recordings.play(footage, { index: from }, extent, rate, key, until),
+      async (frame) => {
+        isAtEnd = frame.index === before && !footage.isGrowing;
+        if (isAtEnd) return false;
+        // The rate may have been changed while the stream was being opened.
+        if (before < 0 && this.#rate !== rate) this.#recordings.setRate(key, this.#rate).catch(() => undefined);
+        this.#key = key;
+        before = frame.index;
+        await this.#sink.take(frame);
+        return !signal.aborted;
+      },
+      signal,
+      kMaxSilenceMs + kMaxFrameMs * Math.max(0, -rate),
+    );
+    return isAtEnd;
+  }
+
+  /** After the server has ended the stream. */
+  async #whatFollows(signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
+    const { index, ageMs } = this.#sink.shown;
+    const last = { index, ageMs, rate: this.#rate, frameCount: this.#opened.frameCount };
+    const end = await streamEnd(this.#recordings, this.#opened.footage, last);
+    if (signal.aborted || end.kind === "lost") return "lost";
+    if (end.kind === "removed") throw new ServerError(404, 0, "");
+    this.#opened.update(end.footage);
+    if (end.kind !== "more" || !end.footage.isGrowing) return end.kind;
+    if (this.#rate > 1) this.#sink.slowedTo((this.#rate = 1));
+    await delay(kTailDelayMs, signal);
+    return "more";
+  }
+}
