@@ -26,7 +26,7 @@
 //     map/        e-maps and their editor
 //     settings/   the sections of the settings: cameras and their groups, maps and devices, accounts, hosts, storage,
 //                 system, audit. Most have a list and a page of one record (record_page), whose form (record_form)
-//                 notices what others have changed meanwhile (merge, conflict_panel), as do dialogs (seen)
+//                 notices what others have changed meanwhile (merge, conflict_panel), as do dialogs (seen_record)
 //     widgets/    what all of these use: elements, buttons, icons, fields, credentials, dialogs, texts, titles,
 //                 notices, keys, panning and zooming
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its
@@ -44,8 +44,10 @@ import "./style/picture.css";
 import "./style/wall.css";
 import "./style/wall_menu.css";
 import "./style/large.css";
-import "./style/snapshot.css";
 import "./style/dialog.css";
+import "./style/snapshot.css";
+import "./style/keep.css";
+import "./style/export.css";
 import "./style/stage.css";
 import "./style/transport.css";
 import "./style/events.css";

@@ -9,7 +9,7 @@ import { icon } from "../widgets/icons";
 import { calendarDate, clockTime, snapshotFileName } from "../widgets/text";
 
 export class SnapshotDialog {
-  readonly root = element("dialog", { class: "snapshot", "aria-label": "Snapshot" });
+  readonly root = element("dialog", { class: "card dialog snapshot", "aria-label": "Snapshot" });
   readonly #server: Server;
   #request: AbortController | null = null;
   #fileAddress: string | null = null;
@@ -80,7 +80,7 @@ export class SnapshotDialog {
   #fill(camera: Camera, time: string, ...content: Node[]): void {
     const head = element(
       "header",
-      { class: "snapshot-head" },
+      { class: "dialog-head" },
       element("h2", {}, camera.name),
       element("time", {}, time),
       iconButton("close", "Close", () => this.root.close(), "Esc"),

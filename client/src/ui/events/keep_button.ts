@@ -16,7 +16,7 @@ const kEffect = "A kept recording is not deleted, whatever the limits of its mou
 
 export class KeepButton {
   readonly root = iconButton("notKept", "Keep this recording", () => this.#open());
-  readonly dialog = element("dialog", { class: "dialog", "aria-labelledby": "keep-title" });
+  readonly dialog = element("dialog", { class: "card dialog", "aria-labelledby": "keep-title" });
   readonly #recordings: Recordings;
   readonly #exports: Exports;
   readonly #isManager: boolean;
@@ -77,14 +77,14 @@ export class KeepButton {
     setText(this.#error, "");
     const head = element(
       "header",
-      { class: "snapshot-head" },
+      { class: "dialog-head" },
       element("h2", { id: "keep-title" }, footage.isKept ? "Kept recording" : "Keep this recording"),
       element("span", { class: "bar-gap" }),
       iconButton("close", "Close", () => this.dialog.close(), "Esc"),
     );
     const form = element(
       "form",
-      { class: "dialog-form" },
+      { class: "keep-form" },
       element("p", { class: "quiet" }, kEffect),
       element("label", { for: "keep-note" }, "Note"),
       this.#note,
@@ -104,7 +104,7 @@ export class KeepButton {
     const keep = element("button", { type: "submit", class: "button primary" }, footage.isKept ? "Save note" : "Keep");
     const release = element("button", { type: "button", class: "button", hidden: !footage.isKept }, "Release");
     release.addEventListener("click", () => void this.#change(footage, false));
-    return element("div", { class: "dialog-buttons" }, release, keep);
+    return element("div", { class: "keep-buttons" }, release, keep);
   }
 
   async #change(footage: Footage, isKept: boolean): Promise<void> {

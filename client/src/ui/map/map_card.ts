@@ -10,7 +10,7 @@ import { clockTime, shortDate } from "../widgets/text";
 import { kindName, type MapItemView } from "./map_item";
 
 export class MapCard {
-  readonly root = element("div", { class: "map-card", hidden: true });
+  readonly root = element("div", { class: "card map-card", hidden: true });
   readonly #server: Server;
   readonly #title = element("p", { class: "map-card-title" });
   readonly #text = element("p", { class: "quiet" });

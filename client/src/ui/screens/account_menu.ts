@@ -37,7 +37,7 @@ export class AccountMenu {
     this.button.setAttribute("aria-haspopup", "dialog");
     this.root = element(
       "dialog",
-      { class: "account-menu", "aria-label": `Account ${name}` },
+      { class: "card account-menu", "aria-label": `Account ${name}` },
       element("p", { class: "account-name" }, name),
       this.#item("edit", "Change password", "change-password", () => void this.#changePassword()),
       this.#item("hosts", "Your sessions", "own-sessions", () => void this.#showSessions()),

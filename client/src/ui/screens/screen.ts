@@ -115,5 +115,5 @@ export abstract class Screen {
  * not.
  */
 function isCovered(): boolean {
-  return document.querySelector("dialog:is(.keys, .account-menu, .wall-menu)[open]") !== null;
+  return document.querySelector("dialog:is(.keys, .form-dialog, .account-menu, .wall-menu)[open]") !== null;
 }

@@ -26,7 +26,7 @@ export interface WallMenuActions {
 
 export class WallMenu {
   readonly button: HTMLButtonElement;
-  readonly root = element("dialog", { class: "wall-menu", "aria-label": "Layouts and sequences" });
+  readonly root = element("dialog", { class: "card wall-menu", "aria-label": "Layouts and sequences" });
   readonly #content = element("div", { class: "wall-menu-content" });
   readonly #saved: SavedLayouts;
   readonly #actions: WallMenuActions;

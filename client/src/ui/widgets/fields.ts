@@ -173,7 +173,7 @@ export function fileField(label: string, accept: string, hint = ""): FileField {
 
 /** Part of a form, under a heading. */
 export function formPart(heading: string, ...content: Node[]): HTMLElement {
-  return element("section", { class: "form-part" }, element("h3", {}, heading), ...content);
+  return element("section", { class: "card form-part" }, element("h3", {}, heading), ...content);
 }
 
 export function formRow(...fields: Field<never>[] | { root: HTMLElement }[]): HTMLElement {

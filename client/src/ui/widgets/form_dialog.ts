@@ -35,10 +35,10 @@ export function openDialog(host: HTMLElement, { title, content, submit, attempt 
     message,
     element("div", { class: "form-buttons" }, done, cancel),
   );
-  const dialog = element("dialog", { class: "keys form-dialog", "aria-label": title });
+  const dialog = element("dialog", { class: "card dialog form-dialog", "aria-label": title });
   const close = iconButton("close", "Close", () => dialog.close(), "Esc");
   const gap = element("span", { class: "bar-gap" });
-  const head = element("header", { class: "snapshot-head" }, element("h2", {}, title), gap, close);
+  const head = element("header", { class: "dialog-head" }, element("h2", {}, title), gap, close);
   dialog.append(head, form);
   cancel.addEventListener("click", () => dialog.close());
   return new Promise((resolve) => {

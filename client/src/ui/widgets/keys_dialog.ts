@@ -12,7 +12,7 @@ export type KeyList = readonly (readonly [keys: string, does: string])[];
 const kNames: Record<string, string> = { Left: "←", Right: "→", Up: "↑", Down: "↓" };
 
 export class KeysDialog {
-  readonly root = element("dialog", { class: "keys", "aria-labelledby": "keys-title" });
+  readonly root = element("dialog", { class: "card dialog keys", "aria-labelledby": "keys-title" });
 
   constructor() {
     this.root.addEventListener("click", (event) => event.target === this.root && this.root.close());
@@ -21,7 +21,7 @@ export class KeysDialog {
   show(list: KeyList): void {
     const head = element(
       "header",
-      { class: "snapshot-head" },
+      { class: "dialog-head" },
       element("h2", { id: "keys-title" }, "Keys"),
       element("span", { class: "bar-gap" }),
       iconButton("close", "Close", () => this.root.close(), "Esc"),

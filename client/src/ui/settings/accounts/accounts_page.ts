@@ -38,7 +38,7 @@ export class AccountsPage extends LoadedPage<UserList> {
     const link = element("a", { class: "row-link", href: settingsAddress("accounts", id) }, name);
     return element(
       "li",
-      { class: "record-row" },
+      { class: "card record-row" },
       element("div", { class: "record-row-name" }, link, element("span", { class: "quiet" }, isOwn ? "you" : "")),
       part("record-row-facts", kPrivilegeNames[privilege], `sees ${rightsSummary(deny, list)}${marks}`),
       part("record-row-facts quiet", sessions > 0 ? `${counted(sessions, "session")} open` : "not logged in", used),

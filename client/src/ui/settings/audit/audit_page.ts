@@ -62,7 +62,7 @@ function entryRow(entry: AuditEntry): HTMLElement {
     return element("tr", {}, element("th", { scope: "row" }, name), cell(before), cell(after));
   });
   const heads = ["Setting", "Before", "After"];
-  const entryOf = (content: HTMLElement) => element("li", { class: "audit-entry" }, content);
+  const entryOf = (content: HTMLElement) => element("li", { class: "card audit-entry" }, content);
   if (changes.length === 0) return entryOf(element("div", { class: "audit-line" }, at, what, by));
   const summary = element("summary", { class: "audit-line" }, at, what, by);
   return entryOf(element("details", {}, summary, scrolled("What was changed", plainTable(heads, changes))));

@@ -60,7 +60,7 @@ export class CameraRow {
     const state = element("span", { class: "camera-row-live" }, element("span", { class: "dot" }), this.#state);
     this.root = element(
       "li",
-      { class: "camera-row", "data-camera": String(camera.id) },
+      { class: "card camera-row", "data-camera": String(camera.id) },
       this.#picture,
       part("name", this.#name, this.#groups),
       part("facts", state, this.#sends),

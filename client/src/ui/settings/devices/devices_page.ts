@@ -79,7 +79,7 @@ export class DevicesPage extends LoadedPage<DeviceList> {
     remove.setAttribute("aria-label", `Remove ${name}`);
     return element(
       "li",
-      { class: "device-row" },
+      { class: "card device-row" },
       element("div", { class: "device-name" }, element("h3", {}, name), element("p", { class: "quiet" }, this.#facts(device))),
       change,
       remove,

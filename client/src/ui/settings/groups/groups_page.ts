@@ -45,7 +45,7 @@ function groupRow({ id, name, camera, deniedTo }: GroupRecord, cameras: readonly
   const names = cameras.filter((one) => camera.includes(one.id)).map((one) => one.name);
   return element(
     "li",
-    { class: "record-row" },
+    { class: "card record-row" },
     element("a", { class: "row-link", href: settingsAddress("groups", id) }, name),
     element("span", { class: "quiet" }, names.join(", ") || "no camera"),
     element("span", { class: "quiet" }, deniedTo.length > 0 ? `denied to ${deniedTo.join(", ")}` : ""),

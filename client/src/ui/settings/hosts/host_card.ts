@@ -26,7 +26,7 @@ export function hostCard(record: HostRecord, onRemove: () => void): HostCard {
   const gap = element("span", { class: "bar-gap" });
   const head = element("header", { class: "record-head" }, element("h3", {}, name), state, gap, remove);
   const where = address ? [element("p", { class: "quiet record-place" }, `${address}, port ${port}`)] : [];
-  const root = element("li", { class: "record-card" }, head, ...where, trouble, ...cameras(record));
+  const root = element("li", { class: "card record-card" }, head, ...where, trouble, ...cameras(record));
   return {
     root,
     showState(reason) {

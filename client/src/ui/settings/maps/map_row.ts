@@ -40,7 +40,7 @@ export class MapRow {
     ];
     this.root = element(
       "li",
-      { class: "emap-row", "data-map": String(map.id) },
+      { class: "card emap-row", "data-map": String(map.id) },
       this.#picture,
       element("div", { class: "emap-row-name" }, this.#name, this.#facts),
       element("div", { class: "emap-row-buttons" }, edit, rename, replace, remove),

@@ -38,7 +38,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
   ]);
   return element(
     "li",
-    { class: "record-card" },
+    { class: "card record-card" },
     head,
     element("p", { class: "quiet record-place" }, path),
     ...trouble,

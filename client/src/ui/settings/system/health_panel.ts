@@ -64,10 +64,10 @@ function content(status: SystemStatus, replaceCertificate: () => void): HTMLElem
 function lineRow({ kind, check, text, remedy }: Line): HTMLElement {
   const mark = element("strong", { class: `health-mark ${kind}` }, kKindNames[kind]);
   const head = element("p", {}, mark, ` ${check}: ${text}`);
-  if (!remedy) return element("li", { class: "health-line" }, head);
+  if (!remedy) return element("li", { class: "card health-line" }, head);
   const command = commandOf(remedy);
   const advice = command === remedy ? [] : [element("p", { class: "health-remedy" }, `To do: ${remedy}`)];
-  return element("li", { class: "health-line" }, head, ...advice, ...(command ? [copyable(command)] : []));
+  return element("li", { class: "card health-line" }, head, ...advice, ...(command ? [copyable(command)] : []));
 }
 
 function certificateContent(certificate: Certificate | null): HTMLElement[] {
