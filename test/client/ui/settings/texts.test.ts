@@ -8,7 +8,7 @@ import { kFirstPlan, painted, recordedText, weekText } from "../../../../client/
 import { differences, isSame, merged } from "../../../../client/src/ui/settings/merge";
 import { denialsText, hostAndPort, ownAddress } from "../../../../client/src/ui/settings/hosts/host_text";
 import { kNothingDenied, rightsSummary } from "../../../../client/src/ui/settings/accounts/rights";
-import { commandOf, linesOf, summaryText } from "../../../../client/src/ui/settings/system/system_text";
+import { commandOf, linesOf, summaryText } from "../../../../client/src/ui/settings/system/status_text";
 import { limitsEffect } from "../../../../client/src/ui/settings/storage/storage_text";
 import { bytesText, daysText } from "../../../../client/src/ui/widgets/amounts";
 

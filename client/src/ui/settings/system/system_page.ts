@@ -17,10 +17,10 @@ import { changedFrom } from "../merge";
 import { LoadedPage, type PageContext } from "../page";
 import { RecordForm } from "../record_form";
 import { copyable } from "./copyable";
-import { ErrorPanel } from "./error_panel";
-import { HealthPanel } from "./health_panel";
-import { LogPanel } from "./log_panel";
+import { LastErrorsPanel } from "./last_errors_panel";
+import { LogLevelsPanel } from "./log_levels_panel";
 import { SettingFields, settingLabel, type Values } from "./setting_fields";
+import { StatusPanel } from "./status_panel";
 
 /** All that may be changed as one record; each setting has a revision of its own. */
 interface Stored {
@@ -34,31 +34,31 @@ const valuesOf = ({ settings }: Stored): Values =>
 
 export class SystemPage extends LoadedPage<SettingRecord[]> {
   readonly #system: System;
-  readonly #health: HealthPanel;
-  readonly #errors: ErrorPanel;
-  readonly #log: LogPanel;
+  readonly #status: StatusPanel;
+  readonly #lastErrors: LastErrorsPanel;
+  readonly #logLevels: LogLevelsPanel;
   #form: RecordForm<Values, Stored> | null = null;
 
   constructor(context: PageContext) {
     const again = button("Check again", (pressed) => void whileBusy(pressed, this.#checkAgain()));
     super(context, "System", again);
     this.#system = new System(context.server);
-    this.#health = new HealthPanel(this.#system, this.closed);
-    this.#errors = new ErrorPanel(this.#system, this.closed);
-    this.#log = new LogPanel(this.#system, this.closed);
+    this.#status = new StatusPanel(this.#system, this.closed);
+    this.#lastErrors = new LastErrorsPanel(this.#system, this.closed);
+    this.#logLevels = new LogLevelsPanel(this.#system, this.closed);
     void this.start(
       () => this.#system.settings(),
       (settings) => {
         this.#showAll(settings, context.draft);
-        void whileBusy(again, this.#health.load());
-        void this.#errors.load();
-        void this.#log.load();
+        void whileBusy(again, this.#status.load());
+        void this.#lastErrors.load();
+        void this.#logLevels.load();
       },
     );
   }
 
   async #checkAgain(): Promise<void> {
-    await Promise.all([this.#health.load(), this.#errors.load()]);
+    await Promise.all([this.#status.load(), this.#lastErrors.load()]);
   }
 
   override get isChanged(): boolean {
@@ -89,7 +89,7 @@ export class SystemPage extends LoadedPage<SettingRecord[]> {
     this.#form = form;
     const operators = formPart("On the server only", ...all.filter(({ operator }) => operator).map(operatorsSetting));
     const audit = linkButton("Audit log", settingsAddress("audit"));
-    this.show(this.#health.root, form.root, operators, this.#errors.root, this.#log.root, formPart("Who changed what", audit));
+    this.show(this.#status.root, form.root, operators, this.#lastErrors.root, this.#logLevels.root, formPart("Who changed what", audit));
   }
 
   /** What was typed is given up. */

@@ -2,18 +2,17 @@
 //
 // What is wrong with the installation, the worst first, and what to do about it; its processes and its certificate.
 
-import type { Certificate, System, SystemStatus } from "../../../wire/system";
-import { button } from "../../widgets/button";
+import type { System, SystemStatus } from "../../../wire/system";
 import { element } from "../../widgets/dom";
 import { factList } from "../../widgets/fact_list";
 import { formPart } from "../../widgets/fields";
-import { calendarDate } from "../../widgets/text";
 import { LoadedPart } from "../loaded_part";
 import { askForCertificate } from "./certificate_dialog";
+import { certificatePart } from "./certificate_part";
 import { copyable } from "./copyable";
-import { commandOf, kKindNames, linesOf, processName, processText, storeText, summaryText, type Line } from "./system_text";
+import { commandOf, kKindNames, linesOf, processName, processText, storeText, summaryText, type Line } from "./status_text";
 
-export class HealthPanel {
+export class StatusPanel {
   readonly #part: LoadedPart;
   readonly #system: System;
   readonly #closed: AbortSignal;
@@ -53,11 +52,7 @@ function content(status: SystemStatus, replaceCertificate: () => void): HTMLElem
   return [
     formPart("Health", summary, ...list, ...rest),
     formPart("Components", facts),
-    formPart(
-      "Certificate",
-      ...certificateContent(certificate),
-      element("div", { class: "form-buttons" }, button("Replace the certificate…", replaceCertificate)),
-    ),
+    certificatePart(certificate, replaceCertificate),
   ];
 }
 
@@ -68,21 +63,4 @@ function lineRow({ kind, check, text, remedy }: Line): HTMLElement {
   const command = commandOf(remedy);
   const advice = command === remedy ? [] : [element("p", { class: "health-remedy" }, `To do: ${remedy}`)];
   return element("li", { class: "card health-line" }, head, ...advice, ...(command ? [copyable(command)] : []));
-}
-
-function certificateContent(certificate: Certificate | null): HTMLElement[] {
-  if (!certificate) return [element("p", { class: "quiet" }, "The server has no certificate of its own that can be read.")];
-  const { subject, name, fingerprint, end, selfSigned } = certificate;
-  const hint = "Browsers ask once about a certificate that is self-signed, and show this fingerprint.";
-  return [
-    factList([
-      ["Subject", subject],
-      ["Names", name.join(", ") || "none"],
-      ["Expires", calendarDate(end * 1000)],
-      ["Signed by", selfSigned ? "itself" : "an authority"],
-    ]),
-    element("p", { class: "quiet" }, "Fingerprint (SHA-256)"),
-    copyable(fingerprint),
-    ...(selfSigned ? [element("p", { class: "form-hint" }, hint)] : []),
-  ];
 }

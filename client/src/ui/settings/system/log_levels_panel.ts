@@ -19,7 +19,7 @@ const kOrder = ["off", "error", "warning", "notice", "info", "debug"];
 
 const kTitle = "Log levels";
 
-export class LogPanel {
+export class LogLevelsPanel {
   readonly #part: LoadedPart;
   readonly #system: System;
 

@@ -11,14 +11,14 @@ import { minuteText } from "../../widgets/text";
 import { LoadedPart } from "../loaded_part";
 import { copyable } from "./copyable";
 
-/** At first; the server tells at most as many as `kMost`. */
-const kFew = 10;
-const kMost = 200;
+const kInitialCount = 10;
+/** The server tells no more. */
+const kMaxCount = 200;
 const kJournalCommand = "journalctl -u 'lookhaven-*' -g ' error: '";
 
 const kTitle = "Last errors";
 
-export class ErrorPanel {
+export class LastErrorsPanel {
   readonly #part: LoadedPart;
   readonly #system: System;
 
@@ -31,7 +31,7 @@ export class ErrorPanel {
     return this.#part.root;
   }
 
-  async load(limit = kFew): Promise<void> {
+  async load(limit = kInitialCount): Promise<void> {
     await this.#part.fill(async () => [formPart(kTitle, ...this.#content(await this.#system.logTail(limit), limit))]);
   }
 
@@ -42,12 +42,12 @@ export class ErrorPanel {
       return element("tr", {}, element("th", { scope: "row" }, minuteText(time * 1000)), ...cells);
     });
     const table = rows.length > 0 ? [scrolled(kTitle, plainTable(["Time", "Process", "Error"], rows))] : [];
-    const more = button(`Show up to ${kMost}`, () => void this.load(kMost), "plain");
+    const more = button(`Show up to ${kMaxCount}`, () => void this.load(kMaxCount), "plain");
     const none = files ? "No errors in the log files of this server." : "This server has no log files.";
     const elsewhere = "The programs of this server log to the journal of the system, which is not shown here. On the server, read it with:";
     return [
       ...table,
-      ...(entry.length === limit && limit < kMost ? [element("div", { class: "form-buttons" }, more)] : []),
+      ...(entry.length === limit && limit < kMaxCount ? [element("div", { class: "form-buttons" }, more)] : []),
       ...(rows.length === 0 && !(journal && !files) ? [text(none)] : []),
       ...(journal ? [text(elsewhere), copyable(kJournalCommand)] : []),
     ];
