@@ -106,10 +106,10 @@ std::string LogOut(const Call& call) {
     return SuccessAnswer(Json::nullValue, CookieLine(call.request, "; Max-Age=0") + "Clear-Site-Data: \"cache\"\r\n");
 }
 
-constexpr Method kMethods[] = {{"Login", LogIn, Method::Effect::kChanges},
-                               {"Logout", LogOut, Method::Effect::kChanges},
+constexpr Method kMethods[] = {{"Login", LogIn, Method::Accepts::kPostOnly},
+                               {"Logout", LogOut, Method::Accepts::kPostOnly},
                                {"Status", Status},
-                               {"MakeFirstAccount", MakeFirstAccount, Method::Effect::kChanges}};
+                               {"MakeFirstAccount", MakeFirstAccount, Method::Accepts::kPostOnly}};
 
 }  // namespace
 

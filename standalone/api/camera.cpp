@@ -133,12 +133,12 @@ std::string Order(const Call& call) {
     return SuccessAnswer(data);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
-constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},     {"Probe", ProbeCamera, kChanges, kManagers},
-                               {"Add", Add, kChanges, kManagers},       {"Set", Set, kChanges, kManagers},
-                               {"Remove", Remove, kChanges, kManagers}, {"Order", Order, kChanges, kManagers}};
+constexpr Method kMethods[] = {{"List", List, kPostOnly, kManagers},     {"Probe", ProbeCamera, kPostOnly, kManagers},
+                               {"Add", Add, kPostOnly, kManagers},       {"Set", Set, kPostOnly, kManagers},
+                               {"Remove", Remove, kPostOnly, kManagers}, {"Order", Order, kPostOnly, kManagers}};
 
 }  // namespace
 

@@ -88,13 +88,13 @@ std::string Remove(const Call& call) {
     return SuccessAnswer(Json::objectValue);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
-constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},
-                               {"Add", Add, kChanges, kManagers},
-                               {"Set", Set, kChanges, kManagers},
-                               {"Remove", Remove, kChanges, kManagers}};
+constexpr Method kMethods[] = {{"List", List, kPostOnly, kManagers},
+                               {"Add", Add, kPostOnly, kManagers},
+                               {"Set", Set, kPostOnly, kManagers},
+                               {"Remove", Remove, kPostOnly, kManagers}};
 
 }  // namespace
 

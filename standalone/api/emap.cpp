@@ -171,20 +171,20 @@ std::string Report(const Call& call) {
     return SuccessAnswer(Json::objectValue);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
 constexpr Method kMethods[] = {{"States", States},
-                               {"Items", Items, kReads, kManagers},
-                               {"Devices", Devices, kReads, kManagers},
-                               {"SaveItems", SaveItems, kChanges, kManagers},
-                               {"Report", Report, kChanges, kManagers},
-                               {"List", ListEmaps, kChanges, kManagers},
-                               {"Add", AddEmap, kChanges, kManagers},
-                               {"Picture", SetEmapPicture, kChanges, kManagers},
-                               {"Rename", RenameEmap, kChanges, kManagers},
-                               {"Remove", RemoveEmap, kChanges, kManagers},
-                               {"MayUpload", MayUpload, kReads, kManagers}};
+                               {"Items", Items, kGetAndPost, kManagers},
+                               {"Devices", Devices, kGetAndPost, kManagers},
+                               {"SaveItems", SaveItems, kPostOnly, kManagers},
+                               {"Report", Report, kPostOnly, kManagers},
+                               {"List", ListEmaps, kPostOnly, kManagers},
+                               {"Add", AddEmap, kPostOnly, kManagers},
+                               {"Picture", SetEmapPicture, kPostOnly, kManagers},
+                               {"Rename", RenameEmap, kPostOnly, kManagers},
+                               {"Remove", RemoveEmap, kPostOnly, kManagers},
+                               {"MayUpload", MayUpload, kGetAndPost, kManagers}};
 
 }  // namespace
 

@@ -231,13 +231,13 @@ std::string Next(const Call& call) {
     return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Effect::kChanges},
+constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Accepts::kPostOnly},
                                {"List", List},
                                {"Watch", Watch},
                                {"Get", Get},
                                {"Next", Next},
                                {"Frame", TellFrame},
-                               {"Keep", Keep, Method::Effect::kChanges},
+                               {"Keep", Keep, Method::Accepts::kPostOnly},
                                {"Download", Download},
                                {"PlanExport", PlanExport},
                                {"Export", Export}};

@@ -18,8 +18,8 @@ struct Method {
     // The whole answer; empty when it went to standard output already. Throws Failure for what the caller did wrong or
     // cannot have.
     std::string (*serve)(const Call& call);
-    // kChanges takes POST only; so do methods that read what no address may tell, such as accounts.
-    enum class Effect { kReads, kChanges } effect = Effect::kReads;
+    // POST alone for what changes anything, or has parameters or answers that belong in no log, such as accounts.
+    enum class Accepts { kGetAndPost, kPostOnly } accepts = Accepts::kGetAndPost;
     enum class Audience { kEverybody, kManagers } audience = Audience::kEverybody;
 };
 

@@ -73,7 +73,7 @@ std::string Accept(const Call& call) {
     }
 }
 
-constexpr Method kMethods[] = {{"Cameras", Cameras}, {"Accept", Accept, Method::Effect::kChanges}};
+constexpr Method kMethods[] = {{"Cameras", Cameras}, {"Accept", Accept, Method::Accepts::kPostOnly}};
 
 }  // namespace
 

@@ -193,13 +193,13 @@ std::string Stop(const Call& call) {
     return SuccessAnswer(Json::nullValue);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 
-constexpr Method kMethods[] = {{"SetRate", SetRate, kChanges},
+constexpr Method kMethods[] = {{"SetRate", SetRate, kPostOnly},
                                {"GetPosition", GetPosition},
-                               {"Pause", Pause, kChanges},
-                               {"CheckOwner", CheckOwner, kChanges},
-                               {"Stop", Stop, kChanges}};
+                               {"Pause", Pause, kPostOnly},
+                               {"CheckOwner", CheckOwner, kPostOnly},
+                               {"Stop", Stop, kPostOnly}};
 
 }  // namespace
 

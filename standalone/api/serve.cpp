@@ -150,7 +150,7 @@ std::string RunModule(EntryFunction entry, const Call& call) {
 std::string RunMethod(const OwnApi& api, const Call& call) {
     const Method& method = api.Find(call.version, call.method);
     control::SlotTable::SetCall(call.slot, call.api + '/' + call.method);
-    if (method.effect == Method::Effect::kChanges && call.request.Header("REQUEST_METHOD") != "POST") {
+    if (method.accepts == Method::Accepts::kPostOnly && call.request.Header("REQUEST_METHOD") != "POST") {
         throw Failure(405, "this method takes POST only");
     }
     if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {

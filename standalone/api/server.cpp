@@ -182,14 +182,14 @@ std::string Remove(const Call& call) {
     return SuccessAnswer(data);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
-constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},
-                               {"Check", Check, kChanges, kManagers},
-                               {"Invite", Invite, kChanges, kManagers},
-                               {"Add", Add, kChanges, kManagers},
-                               {"Remove", Remove, kChanges, kManagers}};
+constexpr Method kMethods[] = {{"List", List, kPostOnly, kManagers},
+                               {"Check", Check, kPostOnly, kManagers},
+                               {"Invite", Invite, kPostOnly, kManagers},
+                               {"Add", Add, kPostOnly, kManagers},
+                               {"Remove", Remove, kPostOnly, kManagers}};
 
 }  // namespace
 

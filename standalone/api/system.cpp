@@ -189,19 +189,19 @@ std::string SetSetting(const Call& call) {
     return SuccessAnswer(data);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
 constexpr Method kMethods[] = {{"Health", Health},
                                {"Metrics", Metrics},
-                               {"Status", Status, kChanges, kManagers},
-                               {"Audit", Audit, kChanges, kManagers},
-                               {"Settings", Settings, kChanges, kManagers},
-                               {"SetSetting", SetSetting, kChanges, kManagers},
-                               {"SetCertificate", SetCertificate, kChanges, kManagers},
-                               {"LogTail", LogTail, kChanges, kManagers},
-                               {"LogLevels", LogLevels, kChanges, kManagers},
-                               {"SetLogLevels", SetLogLevels, kChanges, kManagers}};
+                               {"Status", Status, kPostOnly, kManagers},
+                               {"Audit", Audit, kPostOnly, kManagers},
+                               {"Settings", Settings, kPostOnly, kManagers},
+                               {"SetSetting", SetSetting, kPostOnly, kManagers},
+                               {"SetCertificate", SetCertificate, kPostOnly, kManagers},
+                               {"LogTail", LogTail, kPostOnly, kManagers},
+                               {"LogLevels", LogLevels, kPostOnly, kManagers},
+                               {"SetLogLevels", SetLogLevels, kPostOnly, kManagers}};
 
 }  // namespace
 

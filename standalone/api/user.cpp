@@ -163,14 +163,15 @@ std::string ChangePassword(const Call& call) {
     return SuccessAnswer(Json::objectValue);
 }
 
-using enum Method::Effect;
+using enum Method::Accepts;
 using enum Method::Audience;
 
-constexpr Method kMethods[] = {{"List", List, kChanges, kManagers},       {"Add", Add, kChanges, kManagers},
-                               {"Set", Set, kChanges, kManagers},         {"Remove", Remove, kChanges, kManagers},
-                               {"Preview", Preview, kChanges, kManagers}, {"ChangePassword", ChangePassword, kChanges},
-                               {"Sessions", Sessions, kChanges},          {"EndSessions", EndSessions, kChanges},
-                               {"Preferences", Preferences, kChanges},    {"SetPreferences", SetPreferences, kChanges}};
+constexpr Method kMethods[] = {
+    {"List", List, kPostOnly, kManagers},       {"Add", Add, kPostOnly, kManagers},
+    {"Set", Set, kPostOnly, kManagers},         {"Remove", Remove, kPostOnly, kManagers},
+    {"Preview", Preview, kPostOnly, kManagers}, {"ChangePassword", ChangePassword, kPostOnly},
+    {"Sessions", Sessions, kPostOnly},          {"EndSessions", EndSessions, kPostOnly},
+    {"Preferences", Preferences, kPostOnly},    {"SetPreferences", SetPreferences, kPostOnly}};
 
 }  // namespace
 
