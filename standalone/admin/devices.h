@@ -31,7 +31,7 @@ store::Device SetDevice(store::Store& store, const Actor& actor, store::EmapItem
 void RemoveDevice(store::Store& store, const Actor& actor, store::EmapItemType kind, int id,
                   std::optional<std::int64_t> seen);
 
-// How many inputs and outputs a camera of this host or of a recording server has, which stand on e-maps.
+// How many inputs and outputs a camera of this host or of a paired one has, which stand on e-maps.
 void SetCameraPorts(store::Store& store, const Actor& actor, int camera, store::PortCounts counts);
 
 }  // namespace lookhaven::admin

@@ -22,7 +22,7 @@ constexpr std::size_t kSecretBytes = 32;
 RecordingServer RequireServer(store::Store& store, int id) {
     std::optional<RecordingServer> server = RecordingServers(store).Find(id);
     if (!server) {
-        throw store::NotFound("there is no server " + std::to_string(id));
+        throw store::NotFound("there is no paired host " + std::to_string(id));
     }
     return *std::move(server);
 }

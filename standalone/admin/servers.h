@@ -29,7 +29,7 @@ Json::Value ServerRecord(const store::RecordingServer& server);
 
 struct NewPairing {
     store::RecordingServer server;
-    std::string secret;  // for the other host, given out here alone
+    std::string secret;  // for the paired host, given out here alone
 };
 
 // Lets a host, which has that name here, show this one's cameras from now on, or renews that with another secret.

@@ -62,7 +62,7 @@ struct VisibleCamera {
     bool playback = false;
     bool exported = false;  // its recordings, as files
 };
-// All cameras, those of recording servers too, by id. Throws store::NotFound.
+// All cameras, those of paired hosts too, by id. Throws store::NotFound.
 std::vector<VisibleCamera> CamerasAsSeenBy(store::Store& store, int user_id);
 
 }  // namespace lookhaven::admin

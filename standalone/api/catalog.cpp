@@ -124,7 +124,7 @@ std::string CameraStates(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// Of the cameras that the caller may watch or play back, those of recording servers too.
+// Of the cameras that the caller may watch or play back, those of paired hosts too.
 std::string Rights(const Call& call) {
     using store::CameraAccess;
     std::map<CameraAccess, std::set<int>> denied;

@@ -44,7 +44,7 @@ extern const OwnApi kMountApi;     // storage mounts: how full, for how long, an
 extern const OwnApi kPairingApi;   // what a paired host may ask, and one that pairs by a code
 extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends
 extern const OwnApi kPlaybackApi;  // controls a running player of the caller's session
-extern const OwnApi kRelayApi;     // the live view of a recording server's camera on this host's origin
+extern const OwnApi kRelayApi;     // the live view of a paired host's camera on this host's origin
 extern const OwnApi kServerApi;    // the hosts that this one is paired with, for managers
 extern const OwnApi kSystemApi;    // health, metrics, checks, audit log and settings of the installation
 extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own account

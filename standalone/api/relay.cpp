@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Relay: the live view of a recording server's camera on this host's origin.
+// VEXO.Relay: the live view of a paired host's camera on this host's origin.
 //
-// Why so        A browser has no session at the other server. This host checks whether the caller may see the camera,
+// Why so        A browser has no session at the paired host. This host checks whether the caller may see the camera,
 //               and fetches it with a token that is valid for minutes; secret and token never reach the browser. The
-//               request process holds the connection to the other server, so what ends any stream ends this one.
+//               request process holds the connection to the paired host, so what ends any stream ends this one.
 #include "standalone/api/own_apis.h"
 
 #include <poll.h>
@@ -86,7 +86,7 @@ std::string Play(const Call& call) {
         remote::FetchLiveView({server->address, server->port, server->certificate}, request, relay);
     } catch (const remote::NoAnswer& error) {
         base::LogWarning("no live view from " + server->name + ": " + error.what());
-        throw Failure(502, "the recording server does not answer, or does not let this host in");
+        throw Failure(502, "the paired host does not answer, or does not let this one in");
     }
     return "";
 }

@@ -53,7 +53,7 @@ auto Completer(const Call& call) {
     return [&call](const Json::Value& record) { return WithUse(record, Uses(call)); };
 }
 
-// This host's, then those of recording servers, with the server's name.
+// This host's, then those of paired hosts, with the host's name.
 Json::Value CamerasToDeny(store::Store& records) {
     Json::Value list = NamedList(store::Cameras(records).List());
     store::RecordingServers servers(records);

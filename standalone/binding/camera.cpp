@@ -96,7 +96,7 @@ Camera::Camera()
 
 int Camera::Load(int camId, int serverId, int archiveId) {
     if (serverId != 0 || archiveId != 0) {
-        return -1;  // neither recording servers nor archives exist here
+        return -1;  // no recordings of paired hosts and no archives exist here
     }
     return OrFailure("Camera::Load", -1, [&] {
         const auto record = store::Cameras(RequestContext::Current().Records()).Find(camId);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Devices on e-maps beside cameras, and the ids that this host gives to those of recording servers.
+// Devices on e-maps beside cameras, and the ids that this host gives to those of paired hosts.
 #include "platform/emap/device.h"
 
 #include "platform/privilege/privprofile.h"

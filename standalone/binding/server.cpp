@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recording servers of a managing host, and how paired hosts know each other.
+// The paired hosts whose cameras this one shows, and how paired hosts know each other.
 #include "platform/admission/host.h"
 #include "platform/admission/pairauth.h"
 #include "platform/admission/slavehx.h"

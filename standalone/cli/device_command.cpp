@@ -159,8 +159,8 @@ void AddKind(CLI::App& program, const Console& console, const Kind& kind) {
     Command add = group.Add("add", "Adds a device", Add).Option("name", request.name, name, Required);
     add_watchers(add);
     if (kind.type != EmapItemType::kDoor) {
-        add.Option("--server", request.server, "The recording server that owns it (default: this host)")
-            .Option("--id-on-server", request.id_on_server, "Its id on that server");
+        add.Option("--server", request.server, "The paired host that owns it (default: this host)")
+            .Option("--id-on-server", request.id_on_server, "Its id on that host");
     }
     Command set = group.Add("set", "Changes the given properties of a device", Change)
                       .Option("id", request.id, id, Required)

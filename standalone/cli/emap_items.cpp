@@ -136,11 +136,10 @@ void AddEmapItem(CLI::App& emap, const Console& console) {
     };
     const std::string number = "The item's number in emap show";
 
-    Command add =
-        add_command("add", "Places a device", Add)
-            .Option("type", request.item.type, "The type of device", OneOf(kTypes), Required)
-            .Option("id", request.item.device_id, "Its id on its own server", Required)
-            .Option("--server", request.item.server_id, "The recording server that owns it (default: this host)");
+    Command add = add_command("add", "Places a device", Add)
+                      .Option("type", request.item.type, "The type of device", OneOf(kTypes), Required)
+                      .Option("id", request.item.device_id, "Its id on its own host", Required)
+                      .Option("--server", request.item.server_id, "The paired host that owns it (default: this host)");
     AddPlace(add, request);
     Command move = add_command("move", "Changes the given properties of an item", Move)
                        .Option("item", request.number, number, Required);

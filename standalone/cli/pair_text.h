@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a recording server gives to a host that is to show its cameras: one line of text, carried over by a person.
+// What a host gives to the one that is to show its cameras: one line of text, carried over by a person.
 #pragma once
 
 #include <string>

@@ -188,7 +188,8 @@ void Add(const Console& console, const Request& request) try {
     const std::string problem = ConnectionProblem(server, secret);
     Json::Value data = ToData(server);
     data["answers"] = problem.empty();
-    console.Answer(data, "Added server ", server.name, " with id ", server.id, " and ", cameras, " cameras.", problem);
+    console.Answer(data, "Added the paired host ", server.name, " with id ", server.id, " and ", cameras, " cameras.",
+                   problem);
 } catch (const admin::MovesDenials& refusal) {
     throw Failure(kDataError, refusal.what(), " (", DenialsText(DenialsData(refusal.Loss())),
                   "); add --yes to confirm, or another name");
@@ -203,7 +204,7 @@ void Change(const Console& console, const Request& request) {
         is_tried ? ConnectionProblem(server, RecordingServers(store).FindSecret(server.id)) : "";
     Json::Value data = ToData(server);
     data["answers"] = is_tried && problem.empty();
-    console.Answer(data, "Changed server ", server.name, ".", problem);
+    console.Answer(data, "Changed the paired host ", server.name, ".", problem);
 }
 
 void List(const Console& console) {
@@ -216,7 +217,8 @@ void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     try {
         const Json::Value denials = DenialsData(admin::RemoveServer(store, {}, request.id, {}, request.yes));
-        console.Answer(Object("id", request.id, "denials", denials), "Removed server ", request.id, " with its cameras",
+        console.Answer(Object("id", request.id, "denials", denials), "Removed the paired host ", request.id,
+                       " with its cameras",
                        denials.empty() ? "" : ", and what users were denied of it: ", DenialsText(denials), ".");
     } catch (const admin::RemovesDenials& refusal) {
         throw Failure(kDataError, refusal.what(), " (", DenialsText(DenialsData(refusal.Loss())),
@@ -238,7 +240,7 @@ void Refresh(const Console& console) {
     Json::Value data = Json::arrayValue;
     std::string failures;
     const auto note = [&](const RecordingServer& server, const std::string& failure) {
-        failures += Concat(failures.empty() ? "" : "; ", "the server ", server.name, " failed: ", failure);
+        failures += Concat(failures.empty() ? "" : "; ", "the paired host ", server.name, " failed: ", failure);
     };
     for (const auto& [server, cameras, failure] : remote::AskPairedHosts(store)) {
         if (!failure.empty()) {
@@ -286,7 +288,7 @@ void AddServer(CLI::App& program, const Console& console) {
         .Option("--port", request.change.port, "Its HTTPS port", Satisfies(CLI::Range(1, 65535)))
         .Switch("--enable,!--disable", request.change.enabled, "Whether the two hosts may ask each other");
     group.Add("list", "Lists the hosts", List);
-    group.Add("cameras", "Lists the cameras of other hosts with their ids here", ListCameras);
+    group.Add("cameras", "Lists the cameras of paired hosts with their ids here", ListCameras);
     group.Add("refresh", "Asks the hosts for cameras that were added there", Refresh);
     group.Add("remove", "Ends a pairing", Remove)
         .Option("id", request.id, "The host's id", Required)

@@ -53,7 +53,7 @@ void SetCms(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const bool on = request.word == "on";
     admin::SetSetting(store, {}, "cms", {}, on);
-    console.Answer(Object("cms", on), "This host ", on ? "manages" : "does not manage", " its recording servers.");
+    console.Answer(Object("cms", on), "This host ", on ? "shows" : "does not show", " the cameras of paired hosts.");
 }
 
 void SetMountFolders(const Console& console, const Request& request) {

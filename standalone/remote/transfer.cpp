@@ -2,7 +2,7 @@
 //
 // The shared library liblookhaven-remote.so: one transfer by libcurl.
 //
-// Why so        The other host is trusted with what it was asked for and with nothing else: no header of its answer is
+// Why so        The paired host is trusted with what it was asked for and with nothing else: no header of its answer is
 //               passed on but the content type, and that only when it is one of those expected.
 #include "standalone/remote/transfer.h"
 

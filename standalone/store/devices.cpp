@@ -94,7 +94,7 @@ Device RequireDevice(soci::session& sql, EmapItemType kind, int id) {
     return Require(FetchDevice(sql, kWithId, kind, id), DeviceKindText(kind), id);
 }
 
-// A camera of this host or of a recording server.
+// A camera of this host or of a paired one.
 void RequireAnyCamera(soci::session& sql, int id) {
     const char* query = "select id from cameras where id = :id union select id from remote_cameras where id = :remote";
     Require(FetchOne<int>(sql, query, id, id), "camera", id);
@@ -131,7 +131,7 @@ void RequireValid(const Device& device) {
         throw InvalidRecord("a door is this host's own");
     }
     if (device.server_id != 0 && device.id_on_server < 1) {
-        throw InvalidRecord("a device's id on its server is a number from 1");
+        throw InvalidRecord("a device's id on its host is a number from 1");
     }
     for (const auto& [index, port] : device.ports) {
         if (index < 0 || index >= kMaxPorts || (port.type != PortType::kInput && port.type != PortType::kOutput)) {
@@ -177,10 +177,10 @@ int Devices::Add(const Device& device) {
         if (added.server_id == 0) {
             added.id_on_server = added.id;
         } else {
-            Require(FetchOne<int>(sql, "select id from servers where id = :id", added.server_id), "server",
+            Require(FetchOne<int>(sql, "select id from servers where id = :id", added.server_id), "paired host",
                     added.server_id);
             if (FetchDevice(sql, kOnServer, added.kind, added.server_id, added.id_on_server)) {
-                throw AlreadyExists("this " + DeviceKindText(device.kind) + " of the server is known already");
+                throw AlreadyExists("this " + DeviceKindText(device.kind) + " of the paired host is known already");
             }
         }
         RequirePairedCameras(sql, added);

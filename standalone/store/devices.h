@@ -30,7 +30,7 @@ struct Device {
     EmapItemType kind = EmapItemType::kDoor;
     int id = 0;                      // from 1, never used twice within its kind
     std::string name = {};           // UTF-8, 1 to 64 bytes
-    int server_id = 0;               // the recording server that owns it; 0: this host
+    int server_id = 0;               // the paired host that owns it; 0: this host
     int id_on_server = 0;            // its id there; the same as id for this host's own
     int camera_id = 0;               // that watches a door or POS terminal, by its id on this host; 0: none
     std::map<int, Port> ports = {};  // of an I/O module, by index from 0
@@ -73,7 +73,7 @@ class Devices {
     std::optional<Device> FindOnServer(EmapItemType kind, int server_id, int id_on_server);
     std::vector<Device> List(EmapItemType kind);  // by id
 
-    // Of a camera of this host or of a recording server. Throws NotFound or InvalidRecord.
+    // Of a camera of this host or of a paired one. Throws NotFound or InvalidRecord.
     void SetCameraPorts(int camera_id, PortCounts counts);
     std::map<int, PortCounts> CameraPorts();  // by camera, only those that have any
 

@@ -88,7 +88,7 @@ void RequireDevice(soci::session& sql, const EmapItem& item) {
         constexpr const char* kNames[] = {"camera", "e-map", "door", "I/O module", "POS terminal"};
         throw NotFound(std::string("there is no ") + kNames[static_cast<int>(item.type)] + " " +
                        std::to_string(item.device_id) +
-                       (item.server_id == 0 ? "" : " on server " + std::to_string(item.server_id)));
+                       (item.server_id == 0 ? "" : " on paired host " + std::to_string(item.server_id)));
     }
 }
 

@@ -20,7 +20,7 @@ struct EmapItem {
     EmapItemType type = EmapItemType::kCamera;
     int device_id = 0;      // on the device's own server
     std::string name = {};  // UTF-8, up to 255 bytes
-    int server_id = 0;      // the recording server that owns the device; 0: this host
+    int server_id = 0;      // the paired host that owns the device; 0: this host
     int x = 0;              // pixels of the picture, as y
     int y = 0;
     int direction = 0;      // degrees clockwise from up, 0 to 359

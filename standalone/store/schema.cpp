@@ -103,7 +103,7 @@ constexpr const char* kEmaps[] = {
     "create table device_states (kind integer not null, device_id integer not null, port integer not null,"
     " state text not null, since_s bigint not null, primary key (kind, device_id, port),"
     " foreign key (kind, device_id) references devices (kind, id) on delete cascade)",
-    // Of this host's cameras and of recording servers'.
+    // Of this host's cameras and of paired hosts'.
     "create table camera_ports (camera_id integer not null primary key, inputs integer not null,"
     " outputs integer not null)",
 
@@ -241,7 +241,7 @@ constexpr const char* kPreferences[] = {
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
-    {"e-maps, their devices, recording servers", kEmaps},
+    {"e-maps, their devices, paired hosts", kEmaps},
     {"who reported a mark, and who may", kReporters},
     {"events pending deletion, the order of recording, the recorder lease", kRecordingOrder},
     {"cameras whose HTTPS certificate is not verified", kInsecureCameras},

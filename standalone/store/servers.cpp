@@ -54,13 +54,13 @@ bool IsCertificate(std::string_view text) {
 void RequireValid(soci::session& sql, const RecordingServer& server) {
     if (server.address.empty() ? server.port != 0
                                : !base::IsHost(server.address) || server.port < 1 || server.port > 65'535) {
-        throw InvalidRecord("a server is reached by a host name or address, and a port from 1 to 65535");
+        throw InvalidRecord("a paired host is reached by a host name or address, and a port from 1 to 65535");
     }
     if (server.address.empty() != server.certificate.empty() ||
         (!server.certificate.empty() && !IsCertificate(server.certificate))) {
-        throw InvalidRecord("a server that has an address has a certificate in PEM, of up to 32768 bytes");
+        throw InvalidRecord("a paired host that has an address has a certificate in PEM, of up to 32768 bytes");
     }
-    RequireFreeName(sql, "servers", "a server", server.id, server.name);
+    RequireFreeName(sql, "servers", "a paired host", server.id, server.name);
 }
 
 void RequireSecret(const std::string& secret) {
@@ -71,7 +71,7 @@ void RequireSecret(const std::string& secret) {
 
 // Also locks the row against a concurrent removal, where there are row locks.
 void RequireServer(soci::session& sql, int id) {
-    Require(FetchOne<int>(sql, "update servers set name = name where id = :id returning id", id), "server", id);
+    Require(FetchOne<int>(sql, "update servers set name = name where id = :id returning id", id), "paired host", id);
 }
 
 constexpr const char* kWithId = "where id = :id";
@@ -82,7 +82,7 @@ void RequireValid(const RemoteCamera& camera) {
         throw InvalidRecord("a camera's name is 1 to 255 bytes of UTF-8 without control characters");
     }
     if (camera.id_on_server < 1) {
-        throw InvalidRecord("a camera's id on its server is a number from 1");
+        throw InvalidRecord("a camera's id on its host is a number from 1");
     }
     if (!base::IsVideo(camera.video_type)) {
         throw InvalidRecord("a camera sends MJPEG, H.264 or H.265");
@@ -117,7 +117,7 @@ PutCounts PutRows(soci::session& sql, int server_id, const std::vector<RemoteCam
     }
     if (FetchOne<int>(sql, "select count(*) from remote_cameras where server_id = :id", server_id) >
         static_cast<int>(kMaxServerCameras)) {
-        throw InvalidRecord("a server has 1000 cameras at most");
+        throw InvalidRecord("a paired host has 1000 cameras at most");
     }
     return counts;
 }

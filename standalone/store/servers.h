@@ -17,7 +17,7 @@ namespace lookhaven::store {
 
 struct RecordingServer {
     int id = 0;                    // from 1, never used twice
-    std::string name = {};         // UTF-8, 1 to 64 bytes, no other server's
+    std::string name = {};         // UTF-8, 1 to 64 bytes, no other paired host's
     std::string address = {};      // a host name or address; empty for one that only connects to this host
     int port = 0;                  // of its web server; 0 with an empty address
     std::string certificate = {};  // PEM, what its web server must show; given with an address
@@ -26,7 +26,7 @@ struct RecordingServer {
 
 constexpr unsigned int kMaxServerCameras = 1000;  // what a host says of itself must not fill the store
 
-// A camera of a recording server. Its id comes from the same counter as those of this host's own.
+// A camera of a paired host. Its id comes from the same counter as those of this host's own.
 struct RemoteCamera {
     int id = 0;
     int server_id = 0;
@@ -38,7 +38,7 @@ struct RemoteCamera {
     friend bool operator==(const RemoteCamera&, const RemoteCamera&) = default;
 };
 
-// A right that a user lacks at a camera or device of a recording server.
+// A right that a user lacks at a camera or device of a paired host.
 struct ServerDenial {
     std::string user;
     EmapItemType kind = EmapItemType::kCamera;  // a camera or an I/O module
@@ -61,33 +61,33 @@ class RecordingServers {
     int Add(const RecordingServer& server, const std::string& secret);
     // Replaces the record of server.id, the secret when one is given. Throws as Add, and NotFound.
     void Update(const RecordingServer& server, const std::optional<std::string>& secret = {});
-    // Adds the server with its cameras, or updates the one of that name: a camera keeps its id here, and thereby who
+    // Adds the host with its cameras, or updates the one of that name: a camera keeps its id here, and thereby who
     // is denied it, and one that is not among the cameras any more stays. Returns the id. Throws as Add; AlreadyExists
     // where the name is that of a host that connects to this one, and the other way round.
     int Pair(const RecordingServer& server, const std::string& secret, const std::vector<RemoteCamera>& cameras);
     // Throws as Pair would for the record by itself, and stores nothing.
     void RequirePairable(const RecordingServer& server);
-    // Removes the server with its cameras and devices, and Denials(id) with them; their ids are not used again. Throws
+    // Removes the host with its cameras and devices, and Denials(id) with them; their ids are not used again. Throws
     // NotFound.
     void Remove(int id);
-    // What users are denied of the server, by user.
+    // What users are denied of the host, by user.
     std::vector<ServerDenial> Denials(int id);
 
     std::optional<RecordingServer> Find(int id);
     std::vector<RecordingServer> List();  // by id
 
-    // Empty for an unknown or disabled server.
+    // Empty for an unknown or disabled host.
     std::string FindSecret(int id);
-    // Of the enabled servers without an address: hosts that connect to this one. The secret of a server that this host
+    // Of the enabled hosts without an address: hosts that connect to this one. The secret of a host that this host
     // connects to admits nobody here.
     std::vector<std::string> SecretsOfPairedHosts();
-    // Of all enabled servers, whichever side connects.
+    // Of all enabled hosts, whichever side connects.
     std::set<std::uint64_t> Pairings();
 
-    // Gives the server's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
-    // Returns the id. Throws InvalidRecord, or NotFound for an unknown server.
+    // Gives the host's camera an id on this host, or updates the record of one that has it; camera.id is ignored.
+    // Returns the id. Throws InvalidRecord, or NotFound for an unknown host.
     int PutCamera(const RemoteCamera& camera);
-    // The same for all cameras that the server has now, in one transaction; their server_id is ignored. Nothing is
+    // The same for all cameras that the host has now, in one transaction; their server_id is ignored. Nothing is
     // written, and no revision raised, when all are known so. Returns how many are new here.
     int PutCameras(int server_id, const std::vector<RemoteCamera>& cameras);
     // Throws NotFound.

@@ -176,7 +176,7 @@ class PairingTest(unittest.TestCase):
         line = self.line("Again", impostor.tls_port)
         server = json.loads(self.watcher.cli("server", "add", "Impostor", "--json", text=line))["id"]
         answer = wait_until(lambda: (a := self.relay(1, server=server)).status == 502 and a, 5, "another certificate")
-        self.assertIn("recording server", answer.json["error"]["message"])
+        self.assertIn("paired host", answer.json["error"]["message"])
         with self.assertRaisesRegex(AssertionError, "Impostor failed: its certificate is not the one"):
             self.watcher.cli("server", "refresh")
         impostor.stop()

@@ -44,7 +44,7 @@ export interface UserRecord extends UserSettings {
 
 export interface UserList {
   user: UserRecord[];
-  /** Those of a recording server have its name. */
+  /** Those of a paired host have its name. */
   camera: (Named & { server?: string })[];
   group: (Named & { camera: number[] })[];
   door: Named[];

@@ -51,7 +51,7 @@ export class Alerts {
     return news;
   }
 
-  /** What the camera's picture has a frame for; null for none, and for another server's camera. */
+  /** What the camera's picture has a frame for; null for none, and for a paired host's camera. */
   kindAt({ id, server }: Pick<Camera, "id" | "server">): RawMark["kind"] | null {
     const latest = server ? undefined : this.#latest.get(id);
     return latest && performance.now() < latest.untilMs ? latest.kind : null;

@@ -36,7 +36,7 @@ export interface HostRecord extends HostLoss {
 
 export interface HostList {
   server: HostRecord[];
-  /** Whether cameras of other hosts are shown here at all. */
+  /** Whether cameras of paired hosts are shown here at all. */
   centralManagement: boolean;
 }
 

@@ -23,7 +23,7 @@ export interface Camera {
   liveview_port: number;
   cam_ptz: number;
   sound_support: number;
-  /** The recording server that owns it, where it has this id; absent or 0: this host's own. */
+  /** The paired host that owns it, where it has this id; absent or 0: this host's own. */
   server?: number;
 }
 
@@ -268,7 +268,7 @@ export class Server {
   }
 }
 
-/** How a camera's live view is asked for: the host fetches another server's cameras for us. */
+/** How a camera's live view is asked for: this host fetches those of paired hosts' cameras for us. */
 function playOf({ id, server }: StillCamera, more: Record<string, string>): [string, string, Record<string, string>] {
   const camera = String(id);
   if (server) return ["VEXO.Relay", "Play", { server: String(server), camera, ...more }];

@@ -51,7 +51,7 @@ export class SignalLosses {
     }
   }
 
-  /** Null for a camera that is well, that nobody asks for, or that another host has. */
+  /** Null for a camera that is well, that nobody asks for, or that a paired host has. */
   of({ id, server }: Camera): SignalLoss | null {
     return server ? null : (this.#known.get(id) ?? null);
   }

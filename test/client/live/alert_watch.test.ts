@@ -48,7 +48,7 @@ test("goes on where it was, counts each once, and frames what happens now for te
   expect(server.alerts.news, "the first start is no gap").toEqual({ count: 3, mayBeMore: false });
   const framed = () => [3, 4, 5].map((id) => server.alerts.kindAt({ id }));
   expect(framed()).toEqual(["alert", "pos", null]);
-  expect(server.alerts.kindAt({ id: 3, server: 1 }), "another server's camera").toBeNull();
+  expect(server.alerts.kindAt({ id: 3, server: 1 }), "a paired host's camera").toBeNull();
   await vi.advanceTimersByTimeAsync(kFrameMs);
   expect(framed()).toEqual([null, null, null]);
   expect([server.alerts.look().count, server.alerts.news.count]).toEqual([3, 0]);

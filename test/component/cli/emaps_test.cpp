@@ -61,7 +61,7 @@ TEST_F(EmapsTest, DevicesAreKnownReportedAndDenied) {
           {"io list", 0, "0:in:1 5:out"},
           {"io report 2 on --port 5", 0, "as on"},
           {"io report 2 on --port 6", 66, "no port 6"},
-          {"pos add Till2 --server 7 --id-on-server 1", 66, "no server 7"},
+          {"pos add Till2 --server 7 --id-on-server 1", 66, "no paired host 7"},
           {"pos set 1 --name Desk --json", 0, "\"Desk\""},
           {"camera ports 2 --inputs 2 --outputs 65", 65, "0 to 64"},
           {"user deny viewer --emap 2", 0, "e-map 2 is denied"},
@@ -110,8 +110,8 @@ TEST_F(EmapsTest, AnotherHostIsTakenInByItsLineAlone) {
           {"server add Owner --address 127.0.0.1 --port 1", 69, "no host", "",
            "008J-4CT4-ANK7-F24S-04HM-ASW9-NF6Y-Z93N\n"},
           {"server list --json", 0, "[]"},
-          {"server remove 1", 66, "no server 1"},
-          {"setting set cms on", 0, "manages"},
+          {"server remove 1", 66, "no paired host 1"},
+          {"setting set cms on", 0, "shows the cameras of paired hosts"},
           {"setting set cms maybe", 64, "value"}});
 }
 

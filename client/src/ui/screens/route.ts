@@ -3,7 +3,7 @@
 // What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall, or of it the
 // cameras of one group, #group=3, of a saved layout, #layout=1f0c, or of a sequence of these, #sequence=1f0c; #events,
 // and what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
-// #map=2&camera=5 or, of the recording server 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
+// #map=2&camera=5 or, of the paired host 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
 // with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
 // one-time token.
 //

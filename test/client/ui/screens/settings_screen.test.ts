@@ -134,7 +134,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     setup.host.splice(0, Infinity);
     setup.whyNoHost = "";
     const page = await open("hosts");
-    await page.getByText("No other host yet.").waitFor();
+    await page.getByText("No paired host yet.").waitFor();
     await page.getByRole("button", { name: "Show a code" }).click();
     const dialog = page.getByRole("dialog");
     await dialog.getByLabel("Name of the other host").fill("Office");
@@ -189,7 +189,7 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await dialog.getByText("guard: Yard").waitFor();
     expect(setup.host.length, "nothing that was not seen goes").toBe(1);
     await dialog.getByRole("button", { name: "Remove", exact: true }).click();
-    await page.getByText("No other host yet.").waitFor();
+    await page.getByText("No paired host yet.").waitFor();
   }, 30_000);
 
   test("a camera's new group is ticked; a group keeps the cameras that were removed", async () => {

@@ -14,7 +14,7 @@ import { showCode } from "./code_dialog";
 import { hostCard } from "./host_card";
 import { askToRemoveHost } from "./remove_host";
 
-const kOff = "Cameras of other hosts are not shown: central management is off. It is a setting of the page ";
+const kOff = "Cameras of paired hosts are not shown: central management is off. It is a setting of the page ";
 
 function systemLink(): HTMLElement {
   return element("a", { href: settingsAddress("system") }, "System");
@@ -55,7 +55,7 @@ export class HostsPage extends LoadedPage<HostList> {
     const shown = server.filter(({ address }) => address !== "");
     const showing = server.filter(({ address }) => address === "");
     const sentence =
-      "No other host yet. To show cameras that another host records, have that host show a code, and add it here.";
+      "No paired host yet. To show cameras that another host records, have that host show a code, and add it here.";
     if (server.length === 0) return this.show(emptyState("hosts", sentence, button("Add a host", () => void this.#add(), "primary")));
     const hint = shown.length > 0 && !centralManagement ? [element("p", { class: "record-trouble" }, kOff, systemLink(), ".")] : [];
     this.show(

@@ -33,7 +33,7 @@ export async function askToRemoveHost(host: HTMLElement, hosts: Hosts, record: H
 function consequence({ address, camera }: HostRecord): string {
   if (!address) return "It can show no camera of this host any more. Streams that it shows end at once.";
   const cameras = camera.length === 1 ? "Its camera is" : `Its ${counted(camera.length, "camera")} are`;
-  return `${cameras} not shown here any more, on e-maps neither. Nothing changes on the other host.`;
+  return `${cameras} not shown here any more, on e-maps neither. Nothing changes on the paired host.`;
 }
 
 function rightsSentence(loss: HostLoss): string {
