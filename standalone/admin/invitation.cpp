@@ -56,7 +56,8 @@ Actor ActorOf(store::Store& store, const Json::Value& invitation, const std::str
 
 std::string Invite(store::Store& store, const Actor& actor, const std::string& name,
                    const remote::CertificateFacts& certificate, const base::BootTime& now) {
-    const remote::PairingCode code{remote::CertificateMark(certificate), store::RandomHex(remote::kPairingSecretBytes)};
+    const remote::PairingCode code{remote::FingerprintPrefix(certificate),
+                                   store::RandomHex(remote::kPairingSecretBytes)};
     Apply(store, actor, [&] {
         store::RecordingServer watcher;
         watcher.name = name;

@@ -47,7 +47,7 @@ std::string FetchRightCertificates(const std::string& address, int port, const r
         throw Failed(Reason::kUnreachable);
     }
     try {
-        if (remote::CertificateMark(remote::LoadAndReadCertificate(certificates)) == code.certificate) {
+        if (remote::FingerprintPrefix(remote::LoadAndReadCertificate(certificates)) == code.fingerprint_prefix) {
             return certificates;
         }
     } catch (const remote::InvalidCertificate&) {

@@ -48,7 +48,7 @@ store::RecordingServer AddServer(store::Store& store, const Actor& actor, store:
                                  const std::string& secret, const std::vector<store::RemoteCamera>& cameras,
                                  AddingOptions options);
 
-// Makes known the cameras that the server has now, as RecordingServers::PutCameras does. Returns how many are new here.
+// Makes known the cameras that the host has now, as RecordingServers::PutCameras does. Returns how many are new here.
 int PutServerCameras(store::Store& store, const Actor& actor, int id, const std::vector<store::RemoteCamera>& cameras);
 
 // What is to be different; what is empty stays.
@@ -67,7 +67,7 @@ struct ServerLoss {
 };
 ServerLoss LossOf(store::Store& store, int id);
 
-// Users are denied something of the server, and a new pairing would allow it, since the cameras get other ids then;
+// Users are denied something of the host, and a new pairing would allow it, since the cameras get other ids then;
 // nothing was removed.
 class RemovesDenials : public std::runtime_error {
   public:
@@ -80,7 +80,7 @@ class RemovesDenials : public std::runtime_error {
     ServerLoss loss_;
 };
 
-// A server is known by that name whose certificate is another one, and users are denied something of it. Were the new
+// A host is known by that name whose certificate is another one, and users are denied something of it. Were the new
 // one stored, they would be denied what has the same ids there, and nothing of the old one.
 class MovesDenials : public std::runtime_error {
   public:

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cctype>
 #include <cstdio>
+#include <system_error>
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
@@ -34,11 +35,21 @@ int UtcOffset(const Call& call) {
     return static_cast<int>(offset_min);
 }
 
-void LogTakenAway(const Call& call, const std::string& what, const std::string& cameras,
-                  const archive::TimeSpan& span) {
+void LogFootageSent(const Call& call, const std::string& what, const std::string& cameras,
+                    const archive::TimeSpan& span) {
     const admin::Actor caller = call.Actor();
     base::LogInfo(Json::valueToQuotedString(caller.name.c_str()) + " from " + caller.address + " is sent " + what +
                   " of " + cameras + ", " + base::FormatUtc(span.begin_ms) + " to " + base::FormatUtc(span.end_ms));
+}
+
+void SendUntilClientLeaves(const std::function<void()>& send) {
+    try {
+        send();
+    } catch (const std::system_error& error) {
+        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
+            throw;
+        }
+    }
 }
 
 void SendAttachmentHead(const std::string& content_type, const std::string& name, std::int64_t size_bytes) {

@@ -2,7 +2,6 @@
 #include "standalone/api/download.h"
 
 #include <string>
-#include <system_error>
 
 #include <unistd.h>
 
@@ -38,20 +37,14 @@ std::string Download(const Call& call) {
     options.announce = [&name](std::int64_t size_bytes) { SendAttachmentHead("video/x-matroska", name, size_bytes); };
     call.context.NoteStream();
     OpenFootage(call, footage, 0);  // while an error answer is still possible
-    LogTakenAway(call, "a download", "camera " + std::to_string(footage.camera_id),
-                 {footage.start_s * 1000, footage.end_s * 1000});
+    LogFootageSent(call, "a download", "camera " + std::to_string(footage.camera_id),
+                   {footage.start_s * 1000, footage.end_s * 1000});
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     call.slots.KeepOnly(call.slot);
     const base::Installation& installation = call.context.Installation();
     // The copier reads what a camera has sent.
     EnterPlaybackSandbox(installation, PlaybackFilter(installation.StoreUrl()));
-    try {
-        remux.Copy(footage.path, STDOUT_FILENO, options);
-    } catch (const std::system_error& error) {
-        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
-            throw;
-        }  // else the client has gone, which is no failure
-    }
+    SendUntilClientLeaves([&] { remux.Copy(footage.path, STDOUT_FILENO, options); });
     return "";
 }
 

@@ -16,7 +16,7 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr std::size_t kMaxAtOnce = 3;
+constexpr std::size_t kMaxConcurrent = 3;
 
 // What is told of each map beside its record.
 struct Use {
@@ -65,7 +65,7 @@ emap::MapPicture DrawnPicture(const Call& call) {
     if (!IsPictureUpload(call)) {
         throw Failure(400, "the body must be the picture's file, and its Content-Type no form's");
     }
-    if (!call.slots.BeginProbing(call.slot, kMaxAtOnce)) {
+    if (!call.slots.BeginProbing(call.slot, kMaxConcurrent)) {
         throw Failure(429, "three pictures or cameras are being processed already; try again in a moment",
                       http::kRetrySoonSeconds);
     }

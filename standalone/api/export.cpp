@@ -6,7 +6,6 @@
 #include <map>
 #include <set>
 #include <string>
-#include <system_error>
 #include <utility>
 
 #include <unistd.h>
@@ -127,7 +126,7 @@ void LogExport(const Call& call, const evidence::Request& request) {
     for (const evidence::CameraFootage& camera : request.cameras) {
         cameras += (cameras.empty() ? "camera " : ", ") + std::to_string(camera.id);
     }
-    LogTakenAway(call, "an export", cameras, request.span);
+    LogFootageSent(call, "an export", cameras, request.span);
 }
 
 // Confines the process: what reads on from here has been sent by a camera.
@@ -168,15 +167,11 @@ std::string Export(const Call& call) {
     LogExport(call, plan.request);
     call.context.NoteStream();  // the plan has the limits of a search
     SendAttachmentHead(plan.content_type, plan.name, plan.size_bytes);
-    try {
+    SendUntilClientLeaves([&] {
         evidence::Write(
             plan, remux, [](auto bytes) { return base::WriteAll(STDOUT_FILENO, bytes.data(), bytes.size()); },
             [&key](std::string_view manifest) { return evidence::SignBy(key, manifest); });
-    } catch (const std::system_error& error) {
-        if (error.code() != std::errc::broken_pipe && error.code() != std::errc::connection_reset) {
-            throw;
-        }  // else the client has gone, which is no failure
-    }
+    });
     return "";
 }
 

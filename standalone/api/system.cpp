@@ -142,9 +142,9 @@ std::string Audit(const Call& call) {
 }
 
 std::string Status(const Call& call) {
-    constexpr std::size_t kMaxAtOnce = 2;  // each has a process for each check
+    constexpr std::size_t kMaxConcurrent = 2;  // each has a process for each check
     admin::RequireManager(call.Records(), call.Actor());
-    if (call.slots.BeginRequest(call.slot, kStatusUserId, kMaxAtOnce, std::numeric_limits<std::size_t>::max()) !=
+    if (call.slots.BeginRequest(call.slot, kStatusUserId, kMaxConcurrent, std::numeric_limits<std::size_t>::max()) !=
         control::QuotaResult::kGranted) {
         throw Failure(503, "others are looking at the state just now", http::kRetrySoonSeconds);
     }

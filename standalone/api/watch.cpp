@@ -29,8 +29,8 @@ namespace {
 
 constexpr std::size_t kMaxWatchesOfUser = 16;
 constexpr std::chrono::seconds kHeartbeat{15};
-constexpr std::int64_t kMaxAwaySeconds = 86'400;
-constexpr int kMaxMissed = 1'000;
+constexpr std::int64_t kMaxBacklogAgeSeconds = 86'400;
+constexpr int kMaxBacklog = 1'000;
 constexpr int kMarksPage = 20;  // of up to 8 KiB of text each
 constexpr int kReportsPage = 1'000;
 
@@ -126,7 +126,7 @@ struct Start {
 
 Start StartOf(const Call& call) {
     const std::int64_t now_s = base::WallSeconds();
-    const std::int64_t since_s = now_s - kMaxAwaySeconds;
+    const std::int64_t since_s = now_s - kMaxBacklogAgeSeconds;
     store::Marks marks(call.Records());
     const std::optional<Place> asked = PlaceOf(call);
     Backlog backlog = LookBack(marks, 0, 0, since_s);
@@ -134,8 +134,8 @@ Start StartOf(const Call& call) {
     bool is_resumed = asked && asked->told_s > since_s && asked->told_s <= now_s + 60 &&
                       MayHaveSeen(marks, asked->mark, backlog.newest);
     if (is_resumed) {
-        const Backlog missed = LookBack(marks, asked->mark, kMaxMissed, since_s);
-        is_resumed = missed.missed <= kMaxMissed;
+        const Backlog missed = LookBack(marks, asked->mark, kMaxBacklog, since_s);
+        is_resumed = missed.missed <= kMaxBacklog;
         backlog = is_resumed ? missed : backlog;
     }
     Json::Value data;
@@ -171,7 +171,7 @@ void TellReported(const Call& call, Progress& progress) {
 }
 
 // Due by what was sent alone: what else wakes a watch may be hidden from its caller.
-void TellAlive(const Call& call, Progress& progress) {
+void SendHeartbeat(const Call& call, Progress& progress) {
     if (Clock::now() - progress.sent < kHeartbeat) {
         return;
     }
@@ -194,7 +194,7 @@ std::string Watch(const Call& call) {
     Send(call, "Status: 200 OK\r\nContent-Type: text/event-stream\r\nCache-Control: no-store\r\n\r\n" + event);
     while (!call.context.output()->IsBroken() && !call.slot.MustEnd()) {
         TellReported(call, progress);
-        TellAlive(call, progress);
+        SendHeartbeat(call, progress);
         const auto rest = progress.sent + kHeartbeat - Clock::now();
         base::SleepWhile(reports, seen, std::chrono::ceil<std::chrono::microseconds>(rest));
         seen = reports;

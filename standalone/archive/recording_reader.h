@@ -90,7 +90,7 @@ class RecordingReader {
     std::size_t read_segments_ = 0;  // those that are finished and completely read
     std::vector<RecordedFrame> frames_;
     std::int64_t newest_ms_ = -1;  // time of the last frame that is no repetition
-    std::int64_t newest_us_ = 0;   // when it was shown, by the monotonic clock
+    std::int64_t newest_us_ = 0;   // when it was first seen, by the monotonic clock
     bool grows_ = false;
 };
 

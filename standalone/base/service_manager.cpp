@@ -42,15 +42,15 @@ void Tell(std::string_view state) {
 
 }  // namespace
 
-void TellReady() {
+void NotifyReady() {
     Tell("READY=1");
 }
 
-void TellStopping() {
+void NotifyStopping() {
     Tell("STOPPING=1");
 }
 
-void TellAlive() {
+void NotifyAlive() {
     Tell("WATCHDOG=1");
 }
 

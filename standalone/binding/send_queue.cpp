@@ -149,7 +149,7 @@ bool SendQueue::IsDrained() {
     return false;
 }
 
-bool SendQueue::TakeOverdueTurn() {
+bool SendQueue::TakeOverduePicture() {
     if (!long_since_us_ || now_us_() - *long_since_us_ < kMaxWaitUs) {
         return false;
     }

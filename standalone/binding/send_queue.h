@@ -39,7 +39,7 @@ class LH_PLATFORM_API SendQueue {
     bool IsDrained();
     // It has not been drained for ten seconds: the slowest viewer gets a picture now and then. Once true, the ten
     // seconds begin anew: ask only where there is a picture to send.
-    bool TakeOverdueTurn();
+    bool TakeOverduePicture();
 
   private:
     struct Tcp {

@@ -25,9 +25,9 @@ bool IsDrained() {
     return queue == nullptr || queue->IsDrained();
 }
 
-bool TakeOverdueTurn() {
+bool TakeOverduePicture() {
     SendQueue* queue = RequestContext::Current().Queue();
-    return queue != nullptr && queue->TakeOverdueTurn();
+    return queue != nullptr && queue->TakeOverduePicture();
 }
 
 // Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's
@@ -35,7 +35,7 @@ bool TakeOverdueTurn() {
 std::optional<int> AwaitDrained() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = base::MonotonicMicros() + ring::kMaxWaitMillis * 1000;
-    while (!IsDrained() && !TakeOverdueTurn()) {
+    while (!IsDrained() && !TakeOverduePicture()) {
         if (base::MonotonicMicros() > until_us || ::nanosleep(&kPoll, nullptr) != 0) {
             return std::nullopt;
         }
@@ -104,7 +104,7 @@ const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position
 
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
                                    const ring::SecondReader* sound) {
-    if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverdueTurn())) {
+    if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverduePicture())) {
         g_lag.is_held_back = true;
         return nullptr;
     }

@@ -20,7 +20,7 @@ constexpr std::int64_t kMaxAgeUs = 600'000'000;
 constexpr std::int64_t kMaxAheadUs = 10'000'000;
 // Every format of the picture costs what cameras share: a ring, a recording, the id of an event.
 constexpr std::int64_t kFormatIntervalUs = 10'000'000;
-constexpr int kMaxFormatsAtOnce = 8;
+constexpr int kMaxFormatBurst = 8;
 constexpr int kMaxSampleRateHz = 192'000;
 constexpr int kMaxChannels = 8;
 
@@ -148,8 +148,8 @@ std::optional<media::StreamFormat> MessageReader::ReadFormat(const MessageHead& 
 
 void MessageReader::CountPictureFormat() {
     const std::int64_t now_us = base::MonotonicMicros();
-    formats_paid_until_us_ = std::max(formats_paid_until_us_, now_us) + kFormatIntervalUs;
-    if (formats_paid_until_us_ > now_us + kMaxFormatsAtOnce * kFormatIntervalUs) {
+    formats_accounted_until_us_ = std::max(formats_accounted_until_us_, now_us) + kFormatIntervalUs;
+    if (formats_accounted_until_us_ > now_us + kMaxFormatBurst * kFormatIntervalUs) {
         Refuse("another format of the picture too often");
     }
 }

@@ -57,7 +57,7 @@ class MessageReader {
     std::size_t begin_ = 0;  // of what was received and not read …
     std::size_t end_ = 0;    // … and its end
     std::optional<media::StreamFormat> video_;
-    std::int64_t formats_paid_until_us_ = 0;  // each format of the picture moves it on by its interval
+    std::int64_t formats_accounted_until_us_ = 0;  // each format of the picture moves it on by its interval
     std::optional<media::StreamFormat> audio_;
 };
 

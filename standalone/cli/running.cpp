@@ -15,8 +15,8 @@ namespace lookhaven::cli {
 namespace {
 
 // A recorder renews its lease every five seconds, later where its store is slow.
-constexpr std::chrono::milliseconds kLeaseWait{12'000};
-constexpr std::chrono::milliseconds kLeaseLook{500};
+constexpr std::chrono::milliseconds kLeaseTimeout{12'000};
+constexpr std::chrono::milliseconds kLeasePollInterval{500};
 
 }  // namespace
 
@@ -33,8 +33,8 @@ void RequireNoOtherRecorder(const base::Installation& installation, store::Store
     if (before.holder.empty() || before.holder == store::RecorderName(installation)) {
         return;
     }
-    for (auto waited = kLeaseLook; waited <= kLeaseWait; waited += kLeaseLook) {
-        std::this_thread::sleep_for(kLeaseLook);
+    for (auto waited = kLeasePollInterval; waited <= kLeaseTimeout; waited += kLeasePollInterval) {
+        std::this_thread::sleep_for(kLeasePollInterval);
         if (lease.Current().count != before.count) {
             throw Failure(kUnavailable, "the recorder of ", before.holder, " records into this store: stop it first");
         }

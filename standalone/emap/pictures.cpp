@@ -20,7 +20,7 @@ namespace {
 namespace fs = std::filesystem;
 using namespace std::string_view_literals;
 
-constexpr auto kYoung = std::chrono::minutes(1);
+constexpr auto kMinUnusedAge = std::chrono::minutes(1);
 
 // Removes spaces, comments and processing instructions; false when one does not end.
 bool SkipProlog(std::string_view& text) {
@@ -127,7 +127,8 @@ void Pictures::Sweep() {
     for (const fs::directory_entry& file : fs::directory_iterator(folder_, error)) {
         const fs::file_time_type written = file.last_write_time(error);
         // A young file may be one that another process is about to give to a map.
-        if (!error && !used.contains(file.path().filename()) && fs::file_time_type::clock::now() - written > kYoung) {
+        if (!error && !used.contains(file.path().filename()) &&
+            fs::file_time_type::clock::now() - written > kMinUnusedAge) {
             fs::remove(file.path(), error);
         }
     }

@@ -16,10 +16,10 @@ namespace lookhaven::host {
 
 namespace {
 
-constexpr int kHandedOver = 3;
+constexpr int kFirstPassedDescriptor = 3;  // of those that a service manager opens for a service
 constexpr int kBacklog = 512;
 
-bool IsHandedOver() {
+bool IsSocketPassed() {
     const char* pid = std::getenv("LISTEN_PID");
     const char* count = std::getenv("LISTEN_FDS");
     return pid != nullptr && count != nullptr && std::to_string(::getpid()) == pid && std::string("1") == count;
@@ -57,10 +57,10 @@ void OpenStandardDescriptors() {
 }
 
 Listener::Listener(const std::filesystem::path& path) {
-    if (IsHandedOver()) {
-        socket_.Reset(kHandedOver);
-        ::fcntl(kHandedOver, F_SETFD, FD_CLOEXEC);
-        ::fcntl(kHandedOver, F_SETFL, O_NONBLOCK);
+    if (IsSocketPassed()) {
+        socket_.Reset(kFirstPassedDescriptor);
+        ::fcntl(kFirstPassedDescriptor, F_SETFD, FD_CLOEXEC);
+        ::fcntl(kFirstPassedDescriptor, F_SETFL, O_NONBLOCK);
         return;
     }
     const sockaddr_un address = Address(path);

@@ -28,7 +28,7 @@ namespace lookhaven::host {
 struct ProcessLimits {
     std::chrono::milliseconds answer{30'000};  // for a request that turns out not to be a stream
     std::chrono::milliseconds leave{15'000};   // from the first SIGTERM to SIGKILL
-    std::chrono::milliseconds repeat{100};
+    std::chrono::milliseconds repeat{100};     // from one SIGTERM to the next
 };
 
 class ProcessTable {
@@ -51,7 +51,8 @@ class ProcessTable {
     void EndMarked();
     // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
-    // The process has ended: counts its request, sweeps what it left and frees its slot. False when it is none of these.
+    // The process has ended: counts its request, removes the files that it left, and frees its slot. False when it is
+    // none of these.
     bool Reap(pid_t pid);
 
     // Sends what is due; returns when to come again.

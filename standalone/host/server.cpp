@@ -21,7 +21,7 @@ namespace lookhaven::host {
 
 namespace {
 
-constexpr std::chrono::seconds kRefusalLingers{1};
+constexpr std::chrono::seconds kRefusalLinger{1};
 constexpr std::chrono::seconds kWatcherRestart{1};
 constexpr std::chrono::seconds kSpareRestart{1};
 constexpr std::chrono::milliseconds kAcceptAgain{200};
@@ -62,9 +62,9 @@ Server::Server(const base::Installation& installation, Callbacks callbacks, List
 }
 
 void Server::Run() {
-    base::TellReady();
+    base::NotifyReady();
     while (!ending_ || !processes_.IsEmpty()) {
-        poll_.Wait(DoWhatIsDue(), [this](Awaited kind, std::uint32_t id) { Handle(kind, id); });
+        poll_.Wait(RunDueTasks(), [this](Awaited kind, std::uint32_t id) { Handle(kind, id); });
     }
     EndWatcher();
 }
@@ -151,7 +151,7 @@ void Server::Refuse(Connection& connection, const http::Failure& failure) {
     ::send(connection.socket.Get(), answer.data(), answer.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
     ::shutdown(connection.socket.Get(), SHUT_WR);
     connection.refused = true;
-    connection.until = Clock::now() + kRefusalLingers;
+    connection.until = Clock::now() + kRefusalLinger;
 }
 
 void Server::StartRequest(Connection connection) {
@@ -242,7 +242,7 @@ void Server::BeginShutdown() {
     signalfd_siginfo signal{};
     [[maybe_unused]] const ssize_t got = ::read(signals_.Get(), &signal, sizeof signal);
     ending_ = true;
-    base::TellStopping();
+    base::NotifyStopping();
     watcher_due_ = spare_due_ = accept_due_ = Clock::time_point::max();
     spares_.EndAll();
     listener_.Close();
@@ -250,7 +250,7 @@ void Server::BeginShutdown() {
     processes_.EndAll();
 }
 
-Clock::time_point Server::DoWhatIsDue() {
+Clock::time_point Server::RunDueTasks() {
     const Clock::time_point now = Clock::now();
     if (now >= watcher_due_ && !ending_) {
         StartWatcher();
@@ -263,7 +263,7 @@ Clock::time_point Server::DoWhatIsDue() {
         accept_due_ = Clock::time_point::max();
     }
     if (now >= alive_due_) {
-        base::TellAlive();
+        base::NotifyAlive();
         alive_due_ = now + alive_interval_;
     }
     Clock::time_point next =

@@ -86,7 +86,7 @@ class Server {
     void StartWatcher();
     void BeginShutdown();
     void EndWatcher();
-    Clock::time_point DoWhatIsDue();
+    Clock::time_point RunDueTasks();
 
     const Callbacks callbacks_;
     ServerLimits limits_;

@@ -12,7 +12,7 @@
 
 namespace lookhaven::maintenance {
 
-constexpr std::int64_t kClockTrustUs = std::int64_t{3600} * 1'000'000;
+constexpr std::int64_t kMinSteadyUs = std::int64_t{3600} * 1'000'000;  // without a larger step than the next
 constexpr std::int64_t kMaxTrustedStepS = 86'400;
 
 class ClockWatch {
@@ -23,7 +23,7 @@ class ClockWatch {
 
   private:
     std::optional<std::int64_t> offset_s_;  // of the wall clock, at the last call
-    std::int64_t even_since_us_ = 0;
+    std::int64_t steady_since_us_ = 0;
 };
 
 }  // namespace lookhaven::maintenance

@@ -18,8 +18,8 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr std::size_t kEventsAtOnce = 100;
-constexpr int kMarksAtOnce = 100;
+constexpr std::size_t kEventsPerBatch = 100;
+constexpr int kMarksPerBatch = 100;
 
 std::vector<int> IdsOf(std::span<const store::Event> events) {
     std::vector<int> ids;
@@ -52,7 +52,7 @@ void Deletion::Finish() {
         events_.CancelDeletion(IdsOf(std::span(pending).subspan(removed)));
     }
     for (std::span rest = std::span(pending).first(removed); !rest.empty();) {
-        const std::span page = rest.first(std::min(rest.size(), kEventsAtOnce));
+        const std::span page = rest.first(std::min(rest.size(), kEventsPerBatch));
         Forget(page);
         rest = rest.subspan(page.size());
     }
@@ -105,14 +105,14 @@ void Deletion::RemoveMarks(int camera, std::int64_t end_s) {
     std::vector<store::Mark> page;
     store::Mark last;
     do {
-        page = marks_.EndedBy(camera, end_s, last, kMarksAtOnce);
+        page = marks_.EndedBy(camera, end_s, last, kMarksPerBatch);
         for (const store::Mark& mark : page) {
             last = mark;
             if (!HasFootage(camera, mark.start_s, mark.end_s)) {
                 RemoveMark(mark);
             }
         }
-    } while (page.size() == kMarksAtOnce);
+    } while (page.size() == kMarksPerBatch);
 }
 
 void Deletion::RemoveMark(const store::Mark& mark) {

@@ -32,7 +32,7 @@ constexpr int kMaxCamera = 1'000'000;
 constexpr const char* kLogName = "seconds";
 constexpr const char* kProbeName = ".lookhaven-probe";
 // Of a file system that does not say.
-constexpr std::int64_t kPlentyBytes = std::int64_t{1} << 50;
+constexpr std::int64_t kAssumedFreeBytes = std::int64_t{1} << 50;
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 
 std::string MarkerText(const MountMarker& marker) {
@@ -93,7 +93,7 @@ MountSpace SpaceFrom(const struct statvfs& report) {
                      static_cast<std::int64_t>(report.f_favail)};
     space.total_bytes = std::max<std::int64_t>(space.total_bytes, 0);
     if (space.total_bytes == 0 || space.free_bytes < 0) {
-        space.free_bytes = kPlentyBytes;
+        space.free_bytes = kAssumedFreeBytes;
     }
     if (space.total_files <= 0 || space.free_files < 0) {
         space.total_files = space.free_files = 0;

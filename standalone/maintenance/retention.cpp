@@ -14,7 +14,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr int kEventsAtOnce = 100;
+constexpr int kEventsPerBatch = 100;
 constexpr std::int64_t kFilesOfEvent = 2;  // with its index
 // So many events with dates in the future are looked past.
 constexpr std::size_t kMaxMisdated = 10'000;
@@ -85,9 +85,9 @@ class Retention {
         std::vector<store::Event> misdated;
         store::Event after;
         for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
-            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsAtOnce);
+            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsPerBatch);
             std::vector<store::Event> chosen;
-            has_more = oldest.size() == kEventsAtOnce;
+            has_more = oldest.size() == kEventsPerBatch;
             for (const store::Event& event : oldest) {
                 after = event;
                 if (TakeFromExcess(event) || (has_age_limit_ && IsExpired(mount_, event, now_s_))) {
@@ -154,7 +154,7 @@ RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mou
     std::int64_t bytes = 0;
     store::Event after;
     for (;;) {
-        const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsAtOnce);
+        const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsPerBatch);
         for (const store::Event& event : oldest) {
             after = event;
             const bool is_deleted = bytes < excess_bytes || IsExpired(mount, event, now_s);
@@ -170,7 +170,7 @@ RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mou
                 misdated = {};
             }
         }
-        if (oldest.size() < kEventsAtOnce) {
+        if (oldest.size() < kEventsPerBatch) {
             return forecast;
         }
     }

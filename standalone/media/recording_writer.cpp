@@ -143,7 +143,7 @@ void RecordingWriter::Close() {
         End();
     }
     if (has_failed_ && !std::exchange(is_index_final_, true)) {
-        IndexWhatIsWhole();
+        IndexWholeClusters();
     }
     OnDisk([&] {
         if (frame_count_ == 0) {
@@ -177,7 +177,7 @@ void RecordingWriter::End() {
 }
 
 // Clusters may have come to the disk whole before it was full.
-void RecordingWriter::IndexWhatIsWhole() {
+void RecordingWriter::IndexWholeClusters() {
     try {
         Sync();
         AppendToIndex();

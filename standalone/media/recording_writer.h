@@ -80,7 +80,7 @@ class RecordingWriter {
     template <class Step>
     void WriteOrFail(Step step);
     void End();
-    void IndexWhatIsWhole();
+    void IndexWholeClusters();
     void Remove() const;
     void Sync();
     void AppendToIndex();

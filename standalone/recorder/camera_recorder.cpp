@@ -21,8 +21,8 @@ constexpr std::int64_t kRetryUs = 1'000'000;
 // Until the recorder knows of a mark, or has an id for the event: it asks the store once a second, which may be
 // slow.
 constexpr int kMaxWaitSeconds = 2;
-// Events that begin for a camera's times alone: so many at once, and then one in each interval.
-constexpr std::int64_t kCutsAtOnce = 8;
+// Events that begin for a camera's times alone: so many in a row, and then one in each interval.
+constexpr std::int64_t kMaxCutBurst = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
 constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
 // Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk
@@ -185,11 +185,11 @@ bool CameraRecorder::MustEndBefore(const Frame& frame) {
 // A camera decides its own times, and each event costs what cameras share: a file, a row, an id.
 bool CameraRecorder::MayCutByTimes() {
     const std::int64_t now_us = context_.monotonic_us();
-    cuts_paid_until_us_ = std::max(cuts_paid_until_us_, now_us - kCutsAtOnce * kCutIntervalUs);
-    if (cuts_paid_until_us_ + kCutIntervalUs > now_us) {
+    cuts_accounted_until_us_ = std::max(cuts_accounted_until_us_, now_us - kMaxCutBurst * kCutIntervalUs);
+    if (cuts_accounted_until_us_ + kCutIntervalUs > now_us) {
         return false;
     }
-    cuts_paid_until_us_ += kCutIntervalUs;
+    cuts_accounted_until_us_ += kCutIntervalUs;
     return true;
 }
 

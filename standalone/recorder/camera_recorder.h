@@ -101,7 +101,8 @@ class CameraRecorder {
     std::int64_t previous_us_ = 0;  // capture time of the picture before
     std::int64_t interval_us_ = 0;  // of pictures, smoothed
     bool has_gap_ = false;          // in the open event, which ends before the next key frame
-    std::int64_t cuts_paid_until_us_ = std::numeric_limits<std::int64_t>::min() / 2;
+    // Each event that begins for the times alone moves it on by its interval.
+    std::int64_t cuts_accounted_until_us_ = std::numeric_limits<std::int64_t>::min() / 2;
     std::int64_t last_flush_us_ = 0;
     std::int64_t next_mount_check_us_ = 0;
     std::int64_t try_again_us_ = 0;

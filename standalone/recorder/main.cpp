@@ -44,12 +44,12 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
     base::RaiseDescriptorLimit();  // each camera costs several
     recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit);
     base::LogInfo("started for " + installation.Home().string());
-    base::TellReady();
+    base::NotifyReady();
     while (g_stop == 0) {
         supervisor.Step();
-        base::TellAlive();
+        base::NotifyAlive();
     }
-    base::TellStopping();
+    base::NotifyStopping();
     const bool has_finished = supervisor.Finish(kFinishLimit);
     ring::RetireAll(installation);  // also of earlier recorders, that were killed
     if (!has_finished) {

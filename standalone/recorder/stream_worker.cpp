@@ -136,13 +136,13 @@ void StreamWorker::WriteRings(StreamRings& rings, const media::Packet& packet,
 }
 
 void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& stop) {
-    constexpr std::int64_t kBeatUs = 1'000'000;
+    constexpr std::int64_t kHeartbeatUs = 1'000'000;
     const std::int64_t now_us = base::MonotonicMicros();
     const std::chrono::microseconds wait = backoff_.DelayAfterFailure();
     const std::int64_t end_us = now_us + wait.count();
     for (std::int64_t step_us = now_us; step_us < end_us;) {
         rings.Beat();
-        step_us = std::min(step_us + kBeatUs, end_us);
+        step_us = std::min(step_us + kHeartbeatUs, end_us);
         if (!media::SleepUntil(step_us, stop)) {
             return;
         }

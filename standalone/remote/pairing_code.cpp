@@ -12,7 +12,7 @@ namespace {
 constexpr std::string_view kBase32Digits = "0123456789ABCDEFGHJKMNPQRSTVWXYZ";
 constexpr std::size_t kDigits = 32;
 constexpr std::size_t kGroupDigits = 4;
-constexpr std::size_t kMarkDigits = 20;
+constexpr std::size_t kPrefixDigits = 20;
 constexpr std::size_t kSecretDigits = 2 * kPairingSecretBytes;
 
 // The same bits by the digits of another alphabet.
@@ -55,18 +55,18 @@ char DigitOf(char typed) {
 
 }  // namespace
 
-std::string CertificateMark(const CertificateFacts& certificate) {
-    std::string mark;
+std::string FingerprintPrefix(const CertificateFacts& certificate) {
+    std::string prefix;
     for (const char digit : certificate.fingerprint) {
-        if (digit != ':' && mark.size() < kMarkDigits) {
-            mark += digit >= 'A' && digit <= 'F' ? static_cast<char>(digit - 'A' + 'a') : digit;
+        if (digit != ':' && prefix.size() < kPrefixDigits) {
+            prefix += digit >= 'A' && digit <= 'F' ? static_cast<char>(digit - 'A' + 'a') : digit;
         }
     }
-    return mark;
+    return prefix;
 }
 
 std::string ToText(const PairingCode& code) {
-    const std::string content = code.certificate + code.secret;
+    const std::string content = code.fingerprint_prefix + code.secret;
     std::string text = Recode(content + CrcDigits(content), base::kHexDigits, 4, kBase32Digits, 5);
     for (std::size_t at = kDigits - kGroupDigits; at > 0; at -= kGroupDigits) {
         text.insert(at, 1, '-');
@@ -93,7 +93,7 @@ PairingCode ParsePairingCode(std::string_view text) {
     if (Crc(hex) != 0) {
         throw InvalidPairingCode("the pairing code has a typing error: compare it with the one that is shown");
     }
-    return {hex.substr(0, kMarkDigits), hex.substr(kMarkDigits, kSecretDigits)};
+    return {hex.substr(0, kPrefixDigits), hex.substr(kPrefixDigits, kSecretDigits)};
 }
 
 }  // namespace lookhaven::remote

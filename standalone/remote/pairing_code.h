@@ -19,8 +19,8 @@
 namespace lookhaven::remote {
 
 struct PairingCode {
-    std::string certificate;  // as CertificateMark gives it
-    std::string secret;       // kPairingSecretBytes, in hexadecimal digits
+    std::string fingerprint_prefix;  // of the certificate; as FingerprintPrefix gives it
+    std::string secret;              // kPairingSecretBytes, in hexadecimal digits
 
     friend bool operator==(const PairingCode&, const PairingCode&) = default;
 };
@@ -32,8 +32,8 @@ struct InvalidPairingCode : std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// The first 80 bits of its fingerprint, in hexadecimal digits.
-std::string CertificateMark(const CertificateFacts& certificate);
+// The first 80 bits of the certificate's SHA-256, in hexadecimal digits.
+std::string FingerprintPrefix(const CertificateFacts& certificate);
 
 // "7K3M-…", 39 characters.
 std::string ToText(const PairingCode& code);

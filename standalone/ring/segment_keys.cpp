@@ -21,7 +21,7 @@ namespace lookhaven::ring {
 
 namespace {
 
-constexpr std::uint32_t kKeyMark = 0x4c;  // the highest byte
+constexpr std::uint32_t kKeyPrefix = 0x4c;  // the highest byte
 constexpr std::uint32_t kKeysPerStream = 1U << 16;
 
 // The keys of one stream: their upper half, and the lower half of the first.
@@ -35,7 +35,7 @@ struct StreamKeys {
             hash = (hash ^ static_cast<std::uint32_t>(part)) * 0x9e3779b97f4a7c15ULL;
             hash ^= hash >> 32;
         }
-        upper = (kKeyMark << 8) | (static_cast<std::uint32_t>(hash >> 16) & 0xff);
+        upper = (kKeyPrefix << 8) | (static_cast<std::uint32_t>(hash >> 16) & 0xff);
         first = static_cast<std::uint32_t>(hash) & 0xffff;
     }
 
@@ -150,7 +150,7 @@ std::optional<FoundSegment> OpenIfStreams(int shm_id, std::uint64_t installation
 }  // namespace
 
 bool IsRingKey(key_t key) {
-    return static_cast<std::uint32_t>(key) >> 24 == kKeyMark;
+    return static_cast<std::uint32_t>(key) >> 24 == kKeyPrefix;
 }
 
 bool RemoveIfAbandoned(std::uint64_t installation, int shm_id) {

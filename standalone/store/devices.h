@@ -61,10 +61,10 @@ class Devices {
     explicit Devices(Store& store) : connection_(store.connection()) {}
 
     // Stores the record under a new id of its kind, which it returns. Throws InvalidRecord; NotFound for an unknown
-    // server or paired camera; AlreadyExists when the server's device has an id here.
+    // host or paired camera; AlreadyExists when the host's device has an id here.
     int Add(const Device& device);
-    // Replaces name, paired camera and ports of the device. Throws InvalidRecord, or NotFound for an unknown device, or a
-    // camera that is neither known nor paired with the device already.
+    // Replaces name, paired camera and ports of the device. Throws InvalidRecord, or NotFound for an unknown device, or
+    // a camera that is neither known nor paired with the device already.
     void Update(const Device& device);
     // Its items stay on their maps, hidden, except a door's, which is shown without a state. Throws NotFound.
     void Remove(EmapItemType kind, int id);

@@ -14,7 +14,7 @@ namespace lookhaven::store {
 
 namespace {
 
-constexpr int kRowsAtOnce = 10'000;
+constexpr int kRowsPerBatch = 10'000;
 
 // As PostgreSQL writes an array.
 std::string ArrayText(const std::set<int>& ids) {
@@ -173,7 +173,7 @@ void Events::VisitMount(int mount_id, const Visitor& visitor) {
         do {
             page = connection_.FetchAll<Event>(
                 "where mount_id = :mount and camera_id = :camera and id > :after order by id limit :limit", mount_id,
-                camera, after, kRowsAtOnce);
+                camera, after, kRowsPerBatch);
             for (const Event& event : page) {
                 after = event.id;
                 if (!event.demo) {

@@ -16,8 +16,8 @@ namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::size_t kMaxCodecBytes = 32;
-constexpr int kRowsAtOnce = 10'000;
-constexpr int kRowsMovedAtOnce = 1'000;
+constexpr int kRowsPerBatch = 10'000;
+constexpr int kMovedRowsPerBatch = 1'000;
 
 void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
     if (start_s < 0 || end_s < start_s || end_s - start_s > base::kMaxRecordingSeconds) {
@@ -142,7 +142,7 @@ void Events::BeginDeletionOfCamera(int camera_id) {
         connection_.Write([&](soci::session& sql) {
             const auto start_s =
                 FetchOne<std::int64_t>(sql, "select start_s" + all + " order by start_s limit 1 offset :rows",
-                                       camera_id, kRowsMovedAtOnce - 1);
+                                       camera_id, kMovedRowsPerBatch - 1);
             const std::int64_t last_s = start_s.value_or(std::numeric_limits<std::int64_t>::max());
             Execute(sql,
                     "insert into events_pending_deletion (" + columns + ") select " + columns + next + " and demo = 0",
@@ -177,7 +177,7 @@ int Events::RemoveDemo() {
     int removed = 0;
     for (const char* statement : {"delete from events where id in (select id from events where demo = 1 limit :limit)",
                                   "delete from marks where id in (select id from marks where demo = 1 limit :limit)"}) {
-        while (const int some = connection_.Execute(statement, kRowsAtOnce)) {
+        while (const int some = connection_.Execute(statement, kRowsPerBatch)) {
             removed += some;
         }
     }

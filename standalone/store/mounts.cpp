@@ -21,7 +21,7 @@ struct Mapping<Mount> {
 namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
-constexpr int kRowsAtOnce = 10'000;
+constexpr int kRowsPerBatch = 10'000;
 constexpr int kMaxReservedEvent = 1 << 30;
 
 std::vector<Mount> FetchMounts(soci::session& sql) {
@@ -81,7 +81,7 @@ void ForgetRows(Connection& connection, int id) {
     for (const char* statement :
          {"delete from events where id in (select id from events where mount_id = :id limit :limit)",
           "delete from marks where id in (select id from marks where mount_id = :id limit :limit)"}) {
-        while (connection.Execute(statement, id, kRowsAtOnce) > 0) {
+        while (connection.Execute(statement, id, kRowsPerBatch) > 0) {
         }
     }
 }

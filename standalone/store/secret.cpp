@@ -16,7 +16,7 @@ namespace {
 
 // Of a password that nobody knows. A literal, since computing one at the first unknown name would take twice as long as
 // verifying a known one, and so tell them apart.
-constexpr const char* kNobodysHash =
+constexpr const char* kDummyHash =
     "$argon2id$v=19$m=65536,t=2,p=1$hV8m1iLSluiSrYIMrSKeag$DXWqEsUIys7oW/dbZ40036DcKkJgYYcDjGgiiJ9xt5g";
 
 void InitialiseSodium() {
@@ -52,7 +52,7 @@ std::string HashPassword(std::string_view password) {
 
 bool PasswordMatches(const std::optional<std::string>& hash, std::string_view password) {
     InitialiseSodium();
-    const char* expected = hash ? hash->c_str() : kNobodysHash;
+    const char* expected = hash ? hash->c_str() : kDummyHash;
     const bool matches = crypto_pwhash_str_verify(expected, password.data(), password.size()) == 0;
     return hash && matches;
 }

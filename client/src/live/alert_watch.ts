@@ -16,7 +16,7 @@ import { Backoff } from "./backoff";
 const kMaxSilenceMs = 40_000;
 const kPauseMs = 5_000;
 /** What happened longer ago was missed. */
-const kFreshS = 60;
+const kMaxNewsAgeS = 60;
 
 /** Runs until `signal` is aborted. Kinds that `admits` refuses are left out. */
 export async function watchAlerts(
@@ -40,7 +40,7 @@ export async function watchAlerts(
       } else if (name === "mark") {
         const mark = JSON.parse(data) as RawMark;
         missed -= 1;
-        if (admits(mark.kind)) server.alerts.note(mark, mark.time > nowS + performance.now() / 1000 - kFreshS);
+        if (admits(mark.kind)) server.alerts.note(mark, mark.time > nowS + performance.now() / 1000 - kMaxNewsAgeS);
       }
       place = id;
       backoff.reset();

@@ -64,9 +64,9 @@ export interface Timed {
 const kMaxQueuedFrames = 16;
 /** A frame this far ahead of the audio belongs to no audio that will come. */
 const kMaxAheadUs = 1_000_000;
-const kToleratedLateUs = 40_000;
+const kMaxLateUs = 40_000;
 /** A burst on the network is over sooner. */
-const kLateForMs = 1500;
+const kMinLateMs = 1500;
 
 export class FrameQueue<Frame extends Timed> {
   readonly #queued: Frame[] = [];
@@ -111,14 +111,14 @@ export class FrameQueue<Frame extends Timed> {
   }
 
   #checkLateness(lateUs: number, nowMs: number): void {
-    if (lateUs <= kToleratedLateUs) {
+    if (lateUs <= kMaxLateUs) {
       this.#lateSinceMs = null;
     } else if (this.#lateSinceMs === null) {
       this.#lateSinceMs = nowMs;
       this.#minLateUs = lateUs;
     } else {
       this.#minLateUs = Math.min(this.#minLateUs, lateUs);
-      if (nowMs - this.#lateSinceMs < kLateForMs) return;
+      if (nowMs - this.#lateSinceMs < kMinLateMs) return;
       this.#lateSinceMs = null;
       this.#postponeAudio(this.#minLateUs);
     }

@@ -21,9 +21,9 @@ export interface AudioChunk {
 }
 
 const kBaseDelayMs = 40;
-const kStepAfterGapMs = 40;
-const kStepBackMs = 20;
-const kCalmSeconds = 30;
+const kGrowMs = 40;
+const kShrinkMs = 20;
+const kStableSeconds = 30;
 const kMaxExtraMs = 400;
 const kMaxSurplusMs = 250;
 /** Timestamps that jump further than this belong to another stream. */
@@ -41,10 +41,10 @@ export class JitterBuffer {
   #playing = false;
   #maxChunkMs = 0;
   /** Beyond the base: because of underruns, and because the video comes later. */
-  #afterGapsMs = 0;
-  #postponedMs = 0;
+  #underrunDelayMs = 0;
+  #videoDelayMs = 0;
   /** Played since the last underrun. */
-  #calmSeconds = 0;
+  #stableSeconds = 0;
 
   constructor(outputRate: number) {
     this.#outputRate = outputRate;
@@ -73,13 +73,13 @@ export class JitterBuffer {
     const startUs = first.timestampUs + (this.#at / first.rate) * 1e6;
     const speed = this.#speed(bufferedMs);
     const length = output[0]?.length ?? 0;
-    this.#noteCalm(length / this.#outputRate);
+    this.#countStableTime(length / this.#outputRate);
     for (let index = 0; index < length; index += 1) {
       const chunk = this.#chunks[0];
       if (!chunk) {
         this.#playing = false;
-        this.#calmSeconds = 0;
-        this.#afterGapsMs = Math.min(this.#afterGapsMs + kStepAfterGapMs, kMaxExtraMs);
+        this.#stableSeconds = 0;
+        this.#underrunDelayMs = Math.min(this.#underrunDelayMs + kGrowMs, kMaxExtraMs);
         break;
       }
       output.forEach((channel, number) => (channel[index] = this.#sample(chunk, number)));
@@ -90,14 +90,15 @@ export class JitterBuffer {
 
   /** Delays the audio by this much more, up to a limit, for good. */
   postpone(milliseconds: number): void {
-    const postponedMs = Math.min(this.#postponedMs + milliseconds, kMaxExtraMs);
+    const videoDelayMs = Math.min(this.#videoDelayMs + milliseconds, kMaxExtraMs);
     // Nothing plays until more is buffered.
-    if (postponedMs > this.#postponedMs) this.#playing = false;
-    this.#postponedMs = postponedMs;
+    if (videoDelayMs > this.#videoDelayMs) this.#playing = false;
+    this.#videoDelayMs = videoDelayMs;
   }
 
   /**
-   * The last chunk brings up to its length too much, which would delay audio and video for good. More is of a burst.
+   * Skips what the chunk that reached the target has brought beyond it, which would delay audio and video for good. A
+   * surplus of more than a chunk came in a burst, after which there will be less.
    */
   #begin(surplusMs: number): void {
     const first = this.#chunks[0];
@@ -106,15 +107,15 @@ export class JitterBuffer {
     this.#advance(Math.floor((Math.min(surplusMs, this.#maxChunkMs) / 1000) * first.rate));
   }
 
-  #noteCalm(seconds: number): void {
-    this.#calmSeconds += seconds;
-    if (this.#calmSeconds < kCalmSeconds) return;
-    this.#calmSeconds = 0;
-    this.#afterGapsMs = Math.max(this.#afterGapsMs - kStepBackMs, 0);
+  #countStableTime(seconds: number): void {
+    this.#stableSeconds += seconds;
+    if (this.#stableSeconds < kStableSeconds) return;
+    this.#stableSeconds = 0;
+    this.#underrunDelayMs = Math.max(this.#underrunDelayMs - kShrinkMs, 0);
   }
 
   #targetMs(): number {
-    return kBaseDelayMs + this.#maxChunkMs + Math.min(this.#afterGapsMs + this.#postponedMs, kMaxExtraMs);
+    return kBaseDelayMs + this.#maxChunkMs + Math.min(this.#underrunDelayMs + this.#videoDelayMs, kMaxExtraMs);
   }
 
   #bufferedMs(): number {

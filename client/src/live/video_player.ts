@@ -12,7 +12,7 @@ import { kUndecodable, unsupported, type Unplayable } from "./unplayable";
 
 /** Damage now and then is no reason to give up a stream. */
 const kMaxErrors = 3;
-const kErrorsForgottenMs = 30_000;
+const kErrorWindowMs = 30_000;
 /** Longer than the interval of two key frames. */
 const kMaxFirstPictureMs = 12_000;
 /** A decoder that takes this many frames without returning one never will. */
@@ -93,7 +93,7 @@ export class VideoPlayer {
   /** The next key frame gets a new decoder, unless that has not helped. */
   async #recover(codec: VideoCodec, codecString: string): Promise<void> {
     const nowMs = performance.now();
-    this.#errors = [...this.#errors.filter((atMs) => nowMs - atMs < kErrorsForgottenMs), nowMs];
+    this.#errors = [...this.#errors.filter((atMs) => nowMs - atMs < kErrorWindowMs), nowMs];
     this.#dropDecoder();
     // Browsers do not agree on the error for a codec that they do not support.
     const { supported } = await VideoDecoder.isConfigSupported(configOf(codecString));

@@ -11,7 +11,7 @@
 import type { Footage } from "../wire/footage";
 import type { Recordings, Still } from "../wire/recordings";
 
-const kMaxAtOnce = 3;
+const kMaxConcurrent = 3;
 const kKeptSpans = 24;
 /** Few, so that browsers keep what they have seen. */
 export const kStillWidths = [320, 640, 960, 1280] as const;
@@ -69,7 +69,7 @@ export class ScrubStills {
   }
 
   #pump(): void {
-    while (this.#wanted.length > 0 && this.#running < kMaxAtOnce) void this.#fetch(this.#wanted.shift()!);
+    while (this.#wanted.length > 0 && this.#running < kMaxConcurrent) void this.#fetch(this.#wanted.shift()!);
   }
 
   async #fetch({ camera, footage, atMs, widthPx }: ScrubRequest): Promise<void> {

@@ -44,7 +44,7 @@ const kApi = "VEXO.Server";
 /** The server takes 25 seconds at most. */
 const kPairTimeoutMs = 40_000;
 
-const kWhyNot: Record<string, string> = {
+const kRefusals: Record<string, string> = {
   unreachable: "No Lookhaven host answers at this address and port. Please compare both with what the other host shows.",
   certificate:
     "What answers at this address is not the host that shows the code: its certificate is another one, or has expired. The code was not sent.",
@@ -85,7 +85,7 @@ export class Hosts {
       return await this.#server.call(kApi, "Add", {}, { json: host, timeoutMs: kPairTimeoutMs });
     } catch (error) {
       const { status, code, message, data } = asServerError(error);
-      const reason = kWhyNot[(data as { reason?: string } | null)?.reason ?? ""];
+      const reason = kRefusals[(data as { reason?: string } | null)?.reason ?? ""];
       throw new ServerError(status, code, reason ?? message, data);
     }
   }

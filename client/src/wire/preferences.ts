@@ -19,7 +19,7 @@ import { forgetKeptByBrowser, keptByBrowser } from "./browser_preferences";
 const kApi = "VEXO.User";
 const kTimeoutMs = 5_000;
 /** What changes in quick succession is told at once. */
-const kSettleMs = 1_000;
+const kDebounceMs = 1_000;
 const kRecord = /^saved\./;
 
 type Values = Record<string, unknown>;
@@ -31,7 +31,7 @@ export class Preferences {
   /** Of these, what the server has not taken. */
   #changes: Values = {};
   #takesOver = false;
-  #settling: ReturnType<typeof setTimeout> | undefined;
+  #debounce: ReturnType<typeof setTimeout> | undefined;
   #telling: Promise<void> = Promise.resolve();
   #isTelling = false;
   #saving: Promise<void> = Promise.resolve();
@@ -65,8 +65,8 @@ export class Preferences {
   set(name: string, value: unknown): void {
     if (JSON.stringify(value) === JSON.stringify(this.#values[name])) return;
     this.#values[name] = this.#changes[name] = value;
-    clearTimeout(this.#settling);
-    this.#settling = setTimeout(() => void this.flush(), kSettleMs);
+    clearTimeout(this.#debounce);
+    this.#debounce = setTimeout(() => void this.flush(), kDebounceMs);
   }
 
   /** The names of all that was chosen or saved. */
@@ -102,13 +102,13 @@ export class Preferences {
 
   /** The session is over: what was not told is lost. */
   close(): void {
-    clearTimeout(this.#settling);
+    clearTimeout(this.#debounce);
     this.#closing.abort();
     this.#changes = {};
   }
 
   async #tell(): Promise<void> {
-    clearTimeout(this.#settling);
+    clearTimeout(this.#debounce);
     const changes = this.#changes;
     if (Object.keys(changes).length === 0) return;
     this.#changes = {};

@@ -78,7 +78,7 @@ TEST(PairingCode, TellsEveryWrongDigitAndEveryTwoThatWereSwapped) {
 }
 
 TEST(PairingCode, NamesACertificateByTheFirstTenBytesOfItsFingerprint) {
-    EXPECT_EQ(remote::CertificateMark(kFacts), "8d969eef6ecad3c29a3a");
+    EXPECT_EQ(remote::FingerprintPrefix(kFacts), "8d969eef6ecad3c29a3a");
 }
 
 // So many seconds after the test's present.

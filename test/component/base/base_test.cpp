@@ -144,13 +144,13 @@ TEST_F(FileTest, TheServiceManagerIsToldWhereItListens) {
         const auto size = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
         ASSERT_EQ(::bind(socket.Get(), reinterpret_cast<const sockaddr*>(&address), size), 0) << name;
         ::setenv("NOTIFY_SOCKET", name.c_str(), 1);
-        TellReady();
+        NotifyReady();
         std::array<char, 64> told{};
         EXPECT_EQ(::recv(socket.Get(), told.data(), told.size(), 0), 7) << name;
         EXPECT_STREQ(told.data(), "READY=1");
     }
     ::unsetenv("NOTIFY_SOCKET");
-    TellReady();
+    NotifyReady();
 }
 
 TEST(ServiceManagerTest, TheWatchdogsLimitIsHalvedAndNoOtherProcesss) {

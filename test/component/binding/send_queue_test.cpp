@@ -93,14 +93,14 @@ TEST_F(SendQueueTest, TheSlowestViewerGetsAPictureEveryTenSeconds) {
     std::string turns;
     for (; now_ms < 35'000; now_ms += 500) {
         EXPECT_FALSE(queue.IsDrained());
-        turns += queue.TakeOverdueTurn() ? std::to_string(now_ms / 1000) + " " : "";
+        turns += queue.TakeOverduePicture() ? std::to_string(now_ms / 1000) + " " : "";
     }
     EXPECT_EQ(turns, "10 20 31 ");
     while (recv(client_.Get(), block.data(), block.size(), MSG_DONTWAIT) > 0) {
     }
     EXPECT_TRUE(queue.IsDrained());
     now_ms += 60'000;
-    EXPECT_FALSE(queue.TakeOverdueTurn()) << "it is drained";
+    EXPECT_FALSE(queue.TakeOverduePicture()) << "it is drained";
 }
 
 TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFrame) {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the doctor finds at what runs: cameras, recorder, web API host, web server and its certificate, paired hosts, and
-// what a recorder that was killed has left.
+// What the doctor finds at what runs: cameras, recorder, web API host, web server and its certificate, paired hosts,
+// and what a recorder that was killed has left.
 #include <filesystem>
 #include <fstream>
 #include <memory>

@@ -13,7 +13,7 @@ import { icon } from "../widgets/icons";
 import { calendarDate, clockTime, spanInWords } from "../widgets/text";
 
 const kDenied = "You may play the recordings of this camera, but not export them";
-const kSettleMs = 300;
+const kDebounceMs = 300;
 const kAroundMs = 60_000;
 /** As the server has them. */
 const kMaxCameras = 16;
@@ -119,7 +119,7 @@ export class ExportPanel {
     if (this.#chosen.size > kMaxCameras) return this.#tell(`Choose at most ${kMaxCameras} cameras.`);
     if (toMs - fromMs > kMaxSpanMs) return this.#tell("Choose at most one day.");
     this.#tell("Calculating the size…");
-    this.#timer = setTimeout(() => void this.#plan(this.#span, [...this.#chosen]), kSettleMs);
+    this.#timer = setTimeout(() => void this.#plan(this.#span, [...this.#chosen]), kDebounceMs);
   }
 
   async #plan(span: Span, cameras: readonly number[]): Promise<void> {

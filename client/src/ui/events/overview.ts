@@ -17,7 +17,7 @@ import { EventList } from "./event_list";
 import { listEvents, whyNoEvents } from "./event_listing";
 import { TextSearch } from "./text_search";
 
-const kSettleMs = 150;
+const kDebounceMs = 150;
 
 export interface OverviewActions extends Omit<TimelineActions, "stillAddress"> {
   sameMoment(footage: Footage): void;
@@ -37,7 +37,7 @@ export class Overview {
   readonly #actions: OverviewActions;
   #cameras: readonly Camera[] = [];
   #onStage: readonly number[] = [];
-  #settling: ReturnType<typeof setTimeout> | undefined;
+  #debounce: ReturnType<typeof setTimeout> | undefined;
 
   constructor(recordings: Recordings, preferences: Preferences, actions: OverviewActions) {
     this.#actions = actions;
@@ -122,7 +122,7 @@ export class Overview {
   }
 
   close(): void {
-    clearTimeout(this.#settling);
+    clearTimeout(this.#debounce);
     this.#search.close();
     this.timeline.close();
     this.list.close();
@@ -146,8 +146,8 @@ export class Overview {
   #onMoved(): void {
     const { startMs, endMs } = this.timeline.scale;
     if (this.timeline.showsEvents) this.calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
-    clearTimeout(this.#settling);
-    this.#settling = setTimeout(() => this.reload(), kSettleMs);
+    clearTimeout(this.#debounce);
+    this.#debounce = setTimeout(() => this.reload(), kDebounceMs);
     this.#actions.moved();
   }
 

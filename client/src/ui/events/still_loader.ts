@@ -6,11 +6,11 @@ import { delay } from "../../wire/delay";
 import { Semaphore } from "../../wire/semaphore";
 
 /** Over HTTP/1.1 a browser has six connections, and up to four are playing. */
-const kMaxAtOnce = 2;
-const kSettleMs = 120;
+const kMaxConcurrent = 2;
+const kDebounceMs = 120;
 
 export class StillLoader {
-  readonly #semaphore = new Semaphore(kMaxAtOnce);
+  readonly #semaphore = new Semaphore(kMaxConcurrent);
   readonly #loading = new Map<HTMLImageElement, AbortController>();
 
   /** The image has the class "loaded" once it shows something. */
@@ -31,7 +31,7 @@ export class StillLoader {
   }
 
   async #load(image: HTMLImageElement, address: string, signal: AbortSignal): Promise<void> {
-    await delay(kSettleMs, signal);
+    await delay(kDebounceMs, signal);
     const show = async () => {
       image.src = address;
       const isLoaded = await new Promise<boolean>((resolve) => {

@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is open, kept in the address, so that a reload keeps it and Back leaves it: #camera=5 on the wall, or of it the
-// cameras of one group, #group=3, of a saved layout, #layout=1f0c, or of a sequence of these, #sequence=1f0c; #events,
-// and what events_route.ts says; #maps, and there #map=2, its editor, #map=2&edit, and of that map a camera,
-// #map=2&camera=5 or, of the paired host 3, #map=2&camera=5@3; #settings, and there a section, #settings=cameras,
-// with a record of it, #settings=cameras&open=5, or a new one, &open=new. Before there is an account, #setup= and a
-// one-time token.
+// What is open, kept in the address, so that a reload keeps it and Back leaves it:
+//
+//   #camera=5, #group=3    on the wall, a camera, or the cameras of one group; of a saved layout, #layout=1f0c, or of a
+//                          sequence of these, #sequence=1f0c
+//   #events                and what events_route.ts says
+//   #maps, #map=2          the maps, or one of them; &edit its editor, &camera=5 a camera on it, &camera=5@3 one of the
+//                          paired host 3
+//   #settings=cameras      a section of the settings; &open=5 a record of it, &open=new a new one
+//   #setup=                and a one-time token, before there is an account
 //
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the
 //               browser's history has a number, by which a refused step is taken back.

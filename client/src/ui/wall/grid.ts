@@ -17,7 +17,7 @@ import { Tile, type TileActions, type TileMode } from "./tile";
 import { dragToOrder } from "./tile_drag";
 
 /** Scrolling past a tile must not open and close a stream. */
-const kSettleMs = 120;
+const kDebounceMs = 120;
 /** Drawn wider than this, a picture needs more pixels than the small profile has. */
 const kMaxSmallPicturePx = 800;
 
@@ -50,10 +50,10 @@ export class Grid {
   readonly #observer: IntersectionObserver;
   readonly #resized = new ResizeObserver(() => this.#arrange());
   readonly #assignSoon = () => {
-    clearTimeout(this.#settling);
-    this.#settling = setTimeout(() => this.#assign(), kSettleMs);
+    clearTimeout(this.#debounce);
+    this.#debounce = setTimeout(() => this.#assign(), kDebounceMs);
   };
-  #settling: ReturnType<typeof setTimeout> | undefined;
+  #debounce: ReturnType<typeof setTimeout> | undefined;
   #layout: LayoutChoice = "auto";
   #columns = 1;
   /** The ids of tiles that cannot play a stream, as text to compare. */
@@ -130,7 +130,7 @@ export class Grid {
 
   /** Closes all streams; do not use the grid after that. */
   close(): void {
-    clearTimeout(this.#settling);
+    clearTimeout(this.#debounce);
     document.removeEventListener("visibilitychange", this.#assignSoon);
     this.#observer.disconnect();
     this.#resized.disconnect();

@@ -16,7 +16,7 @@ import { CameraRow } from "./camera_row";
 
 const kStatesIntervalMs = 4_000;
 const kPicturesIntervalMs = 30_000;
-const kPicturesAtOnce = 2;
+const kMaxConcurrentPictures = 2;
 /** Of several moves one after the other, the last is stored. */
 const kOrderDelayMs = 500;
 
@@ -24,7 +24,7 @@ export class CamerasPage extends LoadedPage<CameraSetupList> {
   readonly #setup: CameraSetup;
   readonly #count = element("p", { class: "quiet settings-count" });
   readonly #list = element("ol", { class: "settings-list cameras-list" });
-  readonly #pictures = new Semaphore(kPicturesAtOnce);
+  readonly #pictures = new Semaphore(kMaxConcurrentPictures);
   readonly #conflict = element("div", { class: "form-conflict-place" });
   #rows: CameraRow[] = [];
   /** As the server had it last. */

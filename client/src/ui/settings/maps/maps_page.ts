@@ -14,14 +14,14 @@ import { emptyState, LoadedPage, type PageContext } from "../page";
 import { askToAdd, askToRemove, askToRename, askToReplace } from "./map_dialogs";
 import { MapRow, type MapRowActions } from "./map_row";
 
-const kPicturesAtOnce = 2;
+const kMaxConcurrentPictures = 2;
 const kNone = "There are no maps yet. A map is a floor plan or a site plan on which cameras and devices are placed.";
 
 export class MapsPage extends LoadedPage<EmapRecord[]> {
   readonly #setup: EmapSetup;
   readonly #emaps: Emaps;
   readonly #list = element("ul", { class: "settings-list" });
-  readonly #pictures = new Semaphore(kPicturesAtOnce);
+  readonly #pictures = new Semaphore(kMaxConcurrentPictures);
   readonly #actions: MapRowActions = {
     rename: (map) => void this.#after(askToRename(this.root, this.#setup, map), "The map is renamed."),
     replace: (map) => void this.#after(askToReplace(this.root, this.#setup, map), `${map.name} has another picture.`),
