@@ -109,8 +109,8 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
                          SCMP_SYS(userfaultfd), SCMP_SYS(io_uring_setup), SCMP_SYS(io_uring_enter),
                          SCMP_SYS(io_uring_register), SCMP_SYS(keyctl), SCMP_SYS(add_key), SCMP_SYS(request_key),
                          SCMP_SYS(personality), SCMP_SYS(modify_ldt), SCMP_SYS(vmsplice)});
-    // It serves nobody, and speaks to a database's server alone, where there is one: AF_UNIX, AF_INET, AF_INET6; TCP, or
-    // UDP to a name server.
+    // It serves nobody, and speaks to a database's server alone, where there is one: AF_UNIX, AF_INET, AF_INET6; TCP,
+    // or UDP to a name server.
     filter.AddException({SCMP_SYS(bind), SCMP_SYS(listen), SCMP_SYS(accept), SCMP_SYS(accept4)});
     for (const int family : {0, 3, 4, 5, 6, 7, 8, 9, 11, 12, 13, 14, 15}) {
         filter.AddException({SCMP_SYS(socket)}, {{0, family}});

@@ -24,8 +24,8 @@ class SessionFilter {
     // store has been replaced, which gives it another key.
     void Learn(const std::string& key);
 
-    // False: no cookie carries a secret of this store, so there is no session. True says only that one may exist; it may
-    // have ended. Until the key is known, any well-formed secret counts.
+    // False: no cookie carries a secret of this store, so there is no session. True says only that one may exist; it
+    // may have ended. Until the key is known, any well-formed secret counts.
     bool MayHaveSession(const http::Request& request) const;
 
     // For a request process: from now on nothing here can be reached, by code that a picture has taken over, either.

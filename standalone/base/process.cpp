@@ -24,7 +24,8 @@ namespace lookhaven::base {
 
 std::uint64_t ProcessStartTicks(pid_t pid) {
     std::array<char, 64> path{};
-    // Its first thread's: /proc/PID/stat says the same, but qemu-user answers a process that asks for its own by itself.
+    // Its first thread's: /proc/PID/stat says the same, but qemu-user answers a process that asks for its own by
+    // itself.
     std::snprintf(path.data(), path.size(), "/proc/%d/task/%d/stat", static_cast<int>(pid), static_cast<int>(pid));
     const FileDescriptor file(::open(path.data(), O_RDONLY | O_CLOEXEC));
     if (!file) {

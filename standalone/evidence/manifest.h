@@ -26,7 +26,8 @@ constexpr std::ptrdiff_t kMaxMissingSpans = 4;
 
 struct WrittenFile {
     std::string sha256 = {};
-    // What the plan promised and could no longer be read: at most kMaxMissingSpans, and no more than the file has parts.
+    // What the plan promised and could no longer be read: at most kMaxMissingSpans, and no more than the file has
+    // parts.
     std::vector<archive::TimeSpan> missing = {};
 };
 

@@ -19,7 +19,8 @@ struct Request {
     std::string body;
     std::size_t unread_body_bytes = 0;  // of the body, still on the connection; see body.h
 
-    // Overwrites it all: it may hold a password or a session's secret, and processes are forked that others may take over.
+    // Overwrites it all: it may hold a password or a session's secret, and processes are forked that others may take
+    // over.
     void Wipe();
     // The header's value, borrowed from the request; empty when it is missing.
     std::string_view Header(std::string_view name) const;

@@ -31,8 +31,8 @@ class RequestCounters {
         Durations durations;                     // of those that were no streams
     };
 
-    // call: "VEXO.Event/List", or empty for what named none. It comes from a process that may have been taken over: beyond
-    // kMaxCalls names, and for what is no status, nothing new is told apart.
+    // call: "VEXO.Event/List", or empty for what named none. It comes from a process that may have been taken over:
+    // beyond kMaxCalls names, and for what is no status, nothing new is told apart.
     void NoteServed(std::string_view call, int status, bool is_stream, std::chrono::microseconds took);
     // Without a process.
     void NoteRefused(int status) { ++refused_[status]; }

@@ -40,8 +40,8 @@ class EventWriter {
     void Write(const Frame& frame, bool after_gap = false);
     void Flush();
     // Finishes file and row with what is on the disk; also allowed after another call has thrown. Throws std::exception
-    // when the file cannot be finished, and may be called again later then; until it succeeds the row is that of an open
-    // event, which retention leaves alone.
+    // when the file cannot be finished, and may be called again later then; until it succeeds the row is that of an
+    // open event, which retention leaves alone.
     void Close();
     // Finishes the row alone, for a file that cannot be finished: retention may remove it, verify can repair it.
     void FinishRow();

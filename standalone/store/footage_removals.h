@@ -18,8 +18,8 @@ class FootageRemovals {
     // Call in the transaction that removes the camera. Remembers the last thousand, for a day.
     void Add(int camera, std::int64_t now_s);
     std::vector<int> Cameras();
-    // Begins the deletion of what has come since, but of no camera that there is. Kept recordings stay. Call it every few
-    // seconds.
+    // Begins the deletion of what has come since, but of no camera that there is. Kept recordings stay. Call it every
+    // few seconds.
     void BeginDeletions();
 
   private:

@@ -107,8 +107,8 @@ class Marks {
     std::vector<Mark> List(const MarkFilter& filter);
     // As Events::Next, among saved marks; of one kind, or of both.
     std::optional<Mark> Next(const Step& step, std::optional<MarkKind> kind);
-    // In the order of being reported, which is that of their ids: whoever draws an id holds the counter until the commit,
-    // so none becomes visible after a larger one. Without demo marks.
+    // In the order of being reported, which is that of their ids: whoever draws an id holds the counter until the
+    // commit, so none becomes visible after a larger one. Without demo marks.
     std::vector<Mark> ReportedAfter(int id, int limit);
     struct Report {
         int id = 0;

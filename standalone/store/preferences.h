@@ -17,8 +17,9 @@ class Preferences {
 
     // Empty for an account that has none, and for an unknown one.
     std::string Find(int user_id);
-    // Replaces the account's text by what change makes of it; no other change comes between the two. change may be called
-    // twice. A power cut may lose what was changed last. Throws NotFound for an unknown account, and what change throws.
+    // Replaces the account's text by what change makes of it; no other change comes between the two. change may be
+    // called twice. A power cut may lose what was changed last. Throws NotFound for an unknown account, and what
+    // change throws.
     void Change(int user_id, const std::function<std::string(const std::string& text)>& change);
 
   private:
