@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Event: report what happened at a camera, list it, walk through it, keep it, download its footage.
+// VEXO.Event: report what happened at a camera, list it, walk through it, keep it, stream and download its footage.
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
@@ -13,6 +13,7 @@
 #include "standalone/api/export.h"
 #include "standalone/api/footage.h"
 #include "standalone/api/keep.h"
+#include "standalone/api/stream.h"
 #include "standalone/api/watch.h"
 #include "standalone/base/clock.h"
 #include "standalone/binding/rights.h"
@@ -239,6 +240,7 @@ constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Accepts::kPostOnly},
                                {"Frame", TellFrame},
                                {"Keep", Keep, Method::Accepts::kPostOnly},
                                {"Download", Download},
+                               {"Stream", Stream},
                                {"PlanExport", PlanExport},
                                {"Export", Export}};
 

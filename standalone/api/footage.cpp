@@ -5,6 +5,7 @@
 
 #include "standalone/binding/rights.h"
 #include "standalone/control/flush_request.h"
+#include "standalone/store/cameras.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/value_names.h"
 
@@ -60,8 +61,23 @@ Footage RequireFootage(const Call& call, store::CameraAccess access) {
     return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()), access);
 }
 
-Footage RequireFootage(const Call& call, const store::Event& event) {
-    return Require(call, event.demo ? std::nullopt : std::optional(Of(event)), store::CameraAccess::kPlayback);
+Footage FootageAskedFor(const Call& call) {
+    if (!call.Parameter("event").isNull()) {
+        return RequireFootage(call);
+    }
+    const int camera = call.Parameter("camera").asInt();
+    if (camera <= 0 || call.Parameter("time_ms").isNull()) {
+        throw Failure(400, "needs an event, or a camera and time_ms");
+    }
+    if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
+        throw Failure(404, kNoSuchCamera);
+    }
+    const store::Step back{{camera}, call.NumberOr("time_ms", 0) / 1000 + 1, 0, true};
+    const auto event = store::Events(call.Records()).Next(back, store::Reasons::kAny);
+    if (!event) {
+        throw Failure(404, "nothing was recorded at or before that time");
+    }
+    return Require(call, event->demo ? std::nullopt : std::optional(Of(*event)), store::CameraAccess::kPlayback);
 }
 
 archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, std::int64_t until_ms) {
@@ -80,6 +96,17 @@ archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, s
 int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms) {
     const std::int64_t since_start_ms = std::max(time_ms, recording.StartWallMs()) - recording.StartWallMs();
     return std::clamp(recording.IndexAt(since_start_ms), 0, recording.FrameCount() - 1);
+}
+
+int FrameAskedFor(const Call& call, const archive::RecordingReader& recording) {
+    if (call.Parameter("frame").isNull()) {
+        return FrameAt(recording, call.NumberOr("time_ms", 0));
+    }
+    const int frame = call.Parameter("frame").asInt();
+    if (frame < 0 || frame >= recording.FrameCount()) {
+        throw Failure(404, "the event has no such frame");
+    }
+    return frame;
 }
 
 std::string TellFrame(const Call& call) {

@@ -33,8 +33,9 @@ std::optional<store::MarkKind> KindOf(const Call& call);
 // The call's event and kind. Throws Failure 404 when there is no such event, it has no footage, or the caller lacks
 // that access to its camera.
 Footage RequireFootage(const Call& call, store::CameraAccess access = store::CameraAccess::kPlayback);
-// The footage of a row that was found, to play it back. As above.
-Footage RequireFootage(const Call& call, const store::Event& event);
+// To play it back: of the call's event, or else what its camera recorded last at or before time_ms. As above, and
+// throws Failure 400 where neither is given.
+Footage FootageAskedFor(const Call& call);
 
 // Opens it, with all that the recorder has of it up to that time. Closes the store. Throws Failure 404 when nothing is
 // recorded yet; archive::ArchiveError, std::system_error.
@@ -42,6 +43,9 @@ archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, s
 
 // The index of the last frame at or before that time, by the wall clock; the first or the last one for a time outside.
 int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms);
+
+// The index of the call's frame, or else of that at time_ms. Throws Failure 404 where the recording has no such frame.
+int FrameAskedFor(const Call& call, const archive::RecordingReader& recording);
 
 // The method Frame of VEXO.Event.
 std::string TellFrame(const Call& call);

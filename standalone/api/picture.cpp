@@ -20,7 +20,6 @@
 #include "standalone/api/still_picture.h"
 #include "standalone/binding/rights.h"
 #include "standalone/ring/reader.h"
-#include "standalone/store/cameras.h"
 
 namespace lookhaven::api {
 
@@ -95,37 +94,6 @@ std::string Get(const Call& call) {
     return ImageAnswer(Jpeg(call, *std::move(frame)), captured, kNoStore);
 }
 
-// The footage that was asked for: of an event, or of what the camera recorded last at or before the time.
-Footage FootageOf(const Call& call) {
-    if (!call.Parameter("event").isNull()) {
-        return RequireFootage(call);
-    }
-    const int camera = call.Parameter("camera").asInt();
-    if (camera <= 0 || call.Parameter("time_ms").isNull()) {
-        throw Failure(400, "needs an event, or a camera and time_ms");
-    }
-    if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
-        throw Failure(404, kNoSuchCamera);
-    }
-    const store::Step back{{camera}, call.NumberOr("time_ms", 0) / 1000 + 1, 0, true};
-    const auto event = store::Events(call.Records()).Next(back, store::Reasons::kAny);
-    if (!event) {
-        throw Failure(404, "nothing was recorded at or before that time");
-    }
-    return RequireFootage(call, *event);
-}
-
-int FrameOf(const Call& call, const archive::RecordingReader& recording) {
-    if (call.Parameter("frame").isNull()) {
-        return FrameAt(recording, call.NumberOr("time_ms", 0));
-    }
-    const int frame = call.Parameter("frame").asInt();
-    if (frame < 0 || frame >= recording.FrameCount()) {
-        throw Failure(404, "the event has no such frame");
-    }
-    return frame;
-}
-
 struct RecordedKeyFrame : KeyFrame {
     int width = 0;
     bool is_final = false;  // whenever it is asked for again, the answer is the same
@@ -133,24 +101,20 @@ struct RecordedKeyFrame : KeyFrame {
 
 RecordedKeyFrame KeyFrameOf(const Call& call) {
     const std::int64_t time_ms = call.NumberOr("time_ms", 0);
-    const Footage footage = FootageOf(call);
+    const Footage footage = FootageAskedFor(call);
     const archive::RecordingReader recording = OpenFootage(call, footage, time_ms);
-    const archive::RecordedFrame& shown = recording.At(FrameOf(call, recording));
-    const std::span<const archive::FrameEntry> entries = recording.Entries(shown.segment);
-    std::uint32_t key = shown.entry;
-    while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[shown.entry].time_ms)) {
-        --key;
-    }
-    const archive::IndexHeader& header = recording.Header(shown.segment);
+    const auto [segment, entry, shown_ms] = recording.At(FrameAskedFor(call, recording));
+    const archive::FrameEntry& key = recording.Entries(segment)[recording.KeyEntryOf(segment, entry)];
+    const archive::IndexHeader& header = recording.Header(segment);
     RecordedKeyFrame frame;
     frame.codec = header.codec;
     frame.width = header.width;
-    frame.capture_millis = header.start_wall_ms + entries[key].time_ms;
+    frame.capture_millis = header.start_wall_ms + key.time_ms;
     // What a camera records later may be nearer to a time behind the event.
     frame.is_final =
         !footage.grows && !recording.Grows() && (!call.Parameter("event").isNull() || time_ms < footage.end_s * 1000);
-    frame.data.resize(entries[key].size);
-    recording.ReadBytes(shown.segment, entries[key], frame.data);
+    frame.data.resize(key.size);
+    recording.ReadBytes(segment, key, frame.data);
     return frame;
 }
 

@@ -3,40 +3,20 @@
 
 #include <algorithm>
 #include <array>
+#include <utility>
 
+#include "standalone/archive/matroska_ids.h"
 #include "standalone/base/video.h"
 
 namespace lookhaven::archive {
 
+using namespace matroska;
+
 namespace {
 
-// Element ids, including their length marker, as in the file.
-constexpr std::uint32_t kEbml = 0x1A45DFA3;
-constexpr std::uint32_t kSegment = 0x18538067;
-constexpr std::uint32_t kSeekHead = 0x114D9B74;
-constexpr std::uint32_t kInfo = 0x1549A966;
-constexpr std::uint32_t kTimestampScale = 0x2AD7B1;
-constexpr std::uint32_t kDateUtc = 0x4461;
-constexpr std::uint32_t kTracks = 0x1654AE6B;
-constexpr std::uint32_t kTrackEntry = 0xAE;
-constexpr std::uint32_t kTrackNumber = 0xD7;
-constexpr std::uint32_t kCodecId = 0x86;
-constexpr std::uint32_t kCodecPrivate = 0x63A2;
-constexpr std::uint32_t kVideo = 0xE0;
-constexpr std::uint32_t kPixelWidth = 0xB0;
-constexpr std::uint32_t kPixelHeight = 0xBA;
-constexpr std::uint32_t kCluster = 0x1F43B675;
-constexpr std::uint32_t kTimestamp = 0xE7;
-constexpr std::uint32_t kSimpleBlock = 0xA3;
-constexpr std::uint32_t kBlockGroup = 0xA0;
-constexpr std::uint32_t kBlock = 0xA1;
-constexpr std::uint32_t kReferenceBlock = 0xFB;
-constexpr std::uint32_t kCues = 0x1C53BB6B;
-constexpr std::uint32_t kTags = 0x1254C367;
-constexpr std::uint32_t kVoid = 0xEC;
-
+// Parameter sets of a camera have some hundred bytes.
+constexpr std::size_t kMaxPrivateBytes = 65536;
 constexpr std::uint8_t kKeyFlag = 0x80;
-constexpr std::uint8_t kLacingFlags = 0x06;
 constexpr std::int64_t kYear2001Ms = 978'307'200'000;
 
 using base::Codec;
@@ -99,7 +79,7 @@ void MatroskaBlocks::ReadHead() {
 void MatroskaBlocks::ReadInfo(const Element& info) {
     ebml_.ForEachChild(info, [&](const Element& element) {
         if (element.id == kTimestampScale) {
-            timestamp_scale_ns_ = ebml_.Unsigned(element);
+            tracks_.timestamp_scale_ns = ebml_.Unsigned(element);
         } else if (element.id == kDateUtc && element.Size() == 8) {
             const auto since_2001_ns = static_cast<std::int64_t>(ebml_.Unsigned(element));
             header_.start_wall_ms = std::max<std::int64_t>(kYear2001Ms + since_2001_ns / 1'000'000, 0);
@@ -107,7 +87,7 @@ void MatroskaBlocks::ReadInfo(const Element& info) {
         return true;
     });
     constexpr std::uint64_t kSecondNs = 1'000'000'000;
-    if (timestamp_scale_ns_ == 0 || timestamp_scale_ns_ > kSecondNs) {
+    if (tracks_.timestamp_scale_ns == 0 || tracks_.timestamp_scale_ns > kSecondNs) {
         throw ArchiveError("a Matroska file with an impossible unit of time");
     }
 }
@@ -116,6 +96,7 @@ void MatroskaBlocks::ReadTrack(const Element& track) {
     std::uint64_t number = 0;
     std::string id;
     std::vector<std::uint8_t> private_data;
+    bool is_whole = true;
     int width = 0;
     int height = 0;
     ebml_.ForEachChild(track, [&](const Element& element) {
@@ -124,8 +105,9 @@ void MatroskaBlocks::ReadTrack(const Element& track) {
         } else if (element.id == kCodecId) {
             id = ebml_.Text(element);
         } else if (element.id == kCodecPrivate) {
-            const auto bytes = ebml_.Bytes(element.data, element.SizeUpTo(2));
+            const auto bytes = ebml_.Bytes(element.data, element.SizeUpTo(kMaxPrivateBytes));
             private_data.assign(bytes.begin(), bytes.end());
+            is_whole = bytes.size() == element.Size();
         } else if (element.id == kVideo) {
             ebml_.ForEachChild(element, [&](const Element& side) {
                 if (side.id == kPixelWidth || side.id == kPixelHeight) {
@@ -137,12 +119,18 @@ void MatroskaBlocks::ReadTrack(const Element& track) {
         return true;
     });
     const std::string codec = CodecNameOf(id, private_data);
+    if (!is_whole) {
+        private_data.clear();
+    }
     if (id.starts_with("A_")) {
         header_.audio_codec = codec;
+        tracks_.audio_track = codec.empty() ? 0 : number;
+        tracks_.audio_private = std::move(private_data);
     } else if (!codec.empty() && header_.codec.empty()) {
         header_.codec = codec;
         header_.width = width;
         header_.height = height;
+        tracks_.video_private = std::move(private_data);
         video_track_ = number;
     }
 }
@@ -242,7 +230,7 @@ bool MatroskaBlocks::ReadBlock(const Element& block, std::uint64_t cluster_time,
     if (time < 0 || (flags & kLacingFlags) != 0 || frame == block.end || block.end - frame > base::kMaxFrameBytes) {
         return false;
     }
-    const std::uint64_t time_ms = static_cast<std::uint64_t>(time) * timestamp_scale_ns_ / 1'000'000;
+    const std::uint64_t time_ms = static_cast<std::uint64_t>(time) * tracks_.timestamp_scale_ns / 1'000'000;
     if (time_ms > kMaxFrameTimeMs) {
         return false;
     }

@@ -17,6 +17,15 @@
 
 namespace lookhaven::archive {
 
+// What the head of a Matroska file says beyond what is in an index.
+struct MatroskaTracks {
+    std::uint64_t timestamp_scale_ns = 1'000'000;
+    // What a decoder has to know beforehand, as Matroska stores it; empty when it is missing, or larger than any is.
+    std::vector<std::uint8_t> video_private;
+    std::vector<std::uint8_t> audio_private;
+    std::uint64_t audio_track = 0;  // 0: none of a codec that is known
+};
+
 class MatroskaBlocks {
   public:
     // Reads everything before the first cluster. Borrows the descriptor. Throws ArchiveError when this is no Matroska
@@ -25,6 +34,7 @@ class MatroskaBlocks {
 
     // From the file; the reason is always 0, and the start is 0 when the file does not say.
     const IndexHeader& Header() const { return header_; }
+    const MatroskaTracks& Tracks() const { return tracks_; }
 
     // Appends the video frames of the next complete cluster. False, without a change, when there is none (yet): the
     // file ends, is truncated, or is damaged here. May be called again after the file has grown. Throws
@@ -50,7 +60,7 @@ class MatroskaBlocks {
     IndexHeader header_;
     std::uint64_t position_ = 0;
     int attempts_ = 0;  // of SkipDamage to read what looks like a cluster
-    std::uint64_t timestamp_scale_ns_ = 1'000'000;
+    MatroskaTracks tracks_;
     std::uint64_t video_track_ = 0;
 };
 

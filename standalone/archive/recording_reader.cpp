@@ -81,6 +81,7 @@ class RecordingReader::Segment {
     }
 
     const std::filesystem::path& Path() const { return path_; }
+    int Descriptor() const { return file_.Get(); }
     const IndexHeader& Header() const { return index_.Header(); }
     std::span<const FrameEntry> Entries() const { return entries_; }
     bool Grows() const { return grows_; }
@@ -277,6 +278,19 @@ std::span<const FrameEntry> RecordingReader::Entries(std::uint32_t segment) cons
 
 const std::filesystem::path& RecordingReader::PathOf(std::uint32_t segment) const {
     return segments_.at(segment)->Path();
+}
+
+int RecordingReader::DescriptorOf(std::uint32_t segment) const {
+    return segments_.at(segment)->Descriptor();
+}
+
+std::uint32_t RecordingReader::KeyEntryOf(std::uint32_t segment, std::uint32_t entry) const {
+    const std::span<const FrameEntry> entries = Entries(segment);
+    std::uint32_t key = entry;
+    while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[entry].time_ms)) {
+        --key;
+    }
+    return key;
 }
 
 void RecordingReader::ReadBytes(std::uint32_t segment, const FrameEntry& frame, std::span<std::uint8_t> buffer) const {

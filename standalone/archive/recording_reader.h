@@ -64,6 +64,11 @@ class RecordingReader {
     const IndexHeader& Header(std::uint32_t segment) const;
     std::span<const FrameEntry> Entries(std::uint32_t segment) const;
     const std::filesystem::path& PathOf(std::uint32_t segment) const;
+    // The open recording; borrowed.
+    int DescriptorOf(std::uint32_t segment) const;
+    // The entry of the key frame with which decoding begins that is to lead to that entry: frames that follow a key
+    // frame but are shown before it may depend on those before it.
+    std::uint32_t KeyEntryOf(std::uint32_t segment, std::uint32_t entry) const;
     // Reads a frame's bytes; the buffer is exactly as large as the frame. Throws ArchiveError when the recording was
     // truncated, std::system_error. Also works after the recording was deleted.
     void ReadBytes(std::uint32_t segment, const FrameEntry& frame, std::span<std::uint8_t> buffer) const;

@@ -13,7 +13,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "standalone/base/file.h"
 #include "standalone/base/file_descriptor.h"
+#include "standalone/base/io.h"
 
 namespace lookhaven::control {
 
@@ -29,8 +31,8 @@ std::string PathOf(std::string_view session) {
 }
 
 // Nothing when it is no regular file of this user under one name: the folder is open to every local user.
-base::FileDescriptor OpenOwn(const std::string& path) {
-    base::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+base::FileDescriptor OpenOwn(const std::string& path, int flags = O_RDONLY) {
+    base::FileDescriptor file(::open(path.c_str(), flags | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
     struct stat status {};
     const bool is_own = file && ::fstat(file.Get(), &status) == 0 && S_ISREG(status.st_mode) &&
                         status.st_uid == ::geteuid() && status.st_nlink <= 1;
@@ -49,6 +51,15 @@ pid_t ProcessIn(const base::FileDescriptor& file) {
 
 pid_t ReadPlayerFile(std::string_view session) {
     return ProcessIn(OpenOwn(PathOf(session)));
+}
+
+void WritePlayerFile(std::string_view session) {
+    const std::string path = PathOf(session);
+    const base::FileDescriptor file = OpenOwn(path, O_WRONLY | O_CREAT);
+    const std::string owner = std::to_string(::getpid());
+    if (!file || ::ftruncate(file.Get(), 0) != 0 || !base::WriteAll(file.Get(), owner.data(), owner.size())) {
+        base::ThrowErrno("cannot write " + path);
+    }
 }
 
 void SweepPlayerFiles() {

@@ -13,6 +13,10 @@ namespace lookhaven::control {
 // waits.
 pid_t ReadPlayerFile(std::string_view session);
 
+// Has the session's file name the calling process. Throws std::system_error: the name may be taken by another user's
+// file, since the folder is open to every local user.
+void WritePlayerFile(std::string_view session);
+
 // Removes the files of this user that name no living process of this user: a host that was killed left them.
 void SweepPlayerFiles();
 

@@ -11,12 +11,13 @@ namespace lookhaven::http {
 namespace {
 
 const char* Reason(int status) {
-    constexpr std::array<std::pair<int, const char*>, 14> kReasons{{{200, "OK"},
+    constexpr std::array<std::pair<int, const char*>, 15> kReasons{{{200, "OK"},
                                                                     {400, "Bad Request"},
                                                                     {401, "Unauthorized"},
                                                                     {403, "Forbidden"},
                                                                     {404, "Not Found"},
                                                                     {405, "Method Not Allowed"},
+                                                                    {406, "Not Acceptable"},
                                                                     {408, "Request Timeout"},
                                                                     {409, "Conflict"},
                                                                     {413, "Content Too Large"},

@@ -50,12 +50,7 @@ std::size_t PictureReader::ReadSmaller(std::uint32_t segment, const archive::Fra
 // Positions the decoder at or before the entry, as close to it as possible.
 void PictureReader::Seek(std::uint32_t segment, std::uint32_t entry) {
     const std::span<const archive::FrameEntry> entries = recording_.Entries(segment);
-    // Pictures may follow a key frame in decoding order but precede it in presentation order, and depend on frames
-    // before it.
-    std::uint32_t key = entry;
-    while (key > 0 && !(entries[key].key && entries[key].time_ms <= entries[entry].time_ms)) {
-        --key;
-    }
+    const std::uint32_t key = recording_.KeyEntryOf(segment, entry);
     const bool is_ahead = is_inside_ && segment_ == segment && key <= next_ &&
                           (shown_ < 0 || entries[entry].time_ms > entries[static_cast<std::size_t>(shown_)].time_ms);
     if (!is_ahead) {

@@ -54,6 +54,7 @@ def words(server):
         "$ORDER_REVISION": str(server.request(call("VEXO.Camera", "List"), "admin", {}).json["data"]["order"]["revision"]),
         "$REVISION": str(next(one["revision"] for one in accounts if one["name"] == "viewer")),
         "$EVENT": str(recorded_events(server, 1)[0]["id"]),
+        "$H264_EVENT": str(recorded_events(server, 2)[0]["id"]),
         "$FROM": str(now - 86400),
         "$TO": str(now),
     }

@@ -67,6 +67,7 @@ Event.Next cameralists={camera} time=-1d: event                       E      E  
 Event.Frame event={event} time_ms=0                                   E      E     D/N     N     D/N  D/N     D/N      D/N      D/N    D/N     E
 POST Event.Keep event={event} note=x                                  E      E     F       F     F    F       F        F        F      D/N     E
 Event.Download event={event}                                          E      E     D/N     N     D/N  D/N     D/N      N        D/N    D/N     E
+Event.Stream event={event} timestamp=5                                E      E     S/N     N     D/N  S/N     S/N      S/N      S/N    S/N     E
 Event.PlanExport cameralists={camera} from=-1d to=now                 E      E     D/N     N     D/N  D/N     D/N      N        D/N    D/N     E
 Event.Export cameralists={camera} from=-1d to=now                     E      E     D/N     N     D/N  D/N     D/N      N        D/N    D/N     E
 Pairing.Cameras                                                       E      E     E       E     E    E       E        E        E      E       D
