@@ -4,7 +4,8 @@
 //               is sent as it is: a few reads from the file, without libav. It is one of the session's players, so it
 //               is counted, replaced and stopped as those of the module are; but a client that seeks, pauses or
 //               changes the rate opens another stream, so it takes no signals but the one that says that it is to end.
-// Invariants    (1) No part is sent more than kLead before its time, so little is wasted when the client seeks.
+// Invariants    (1) No part is sent more than kLead before the time of the frame before it: little is wasted when the
+//                   client seeks, and it knows in time for how long a picture stays.
 //               (2) A stream that is ended early ends without the last boundary.
 #include "standalone/api/stream.h"
 
@@ -12,7 +13,9 @@
 #include <array>
 #include <chrono>
 #include <csignal>
+#include <cstdint>
 #include <cstdio>
+#include <limits>
 #include <optional>
 #include <string_view>
 #include <system_error>
@@ -56,13 +59,17 @@ std::int64_t KeyOf(const Call& call) {
     return key;
 }
 
+Failure NotStreamed(const std::string& codec) {
+    return Failure(406, "footage in " + codec + " is not streamed to this client: play its pictures");
+}
+
 void RequireStreamed(const Call& call, const std::string& codec) {
     const Json::Value& asked = call.Parameter("codecs");
     const std::string named = "," + (asked.isNull() ? "H264" : asked.asString()) + ",";
     const bool is_streamed =
         codec == base::CodecName(base::Codec::kH264) || codec == base::CodecName(base::Codec::kH265);
     if (!is_streamed || named.find("," + codec + ",") == named.npos) {
-        throw Failure(406, "footage in " + codec + " is not streamed to this client: play its pictures");
+        throw NotStreamed(codec);
     }
 }
 
@@ -116,6 +123,12 @@ class Parts {
         return output_.Send(pieces);
     }
 
+    // Says why what follows is not sent.
+    bool Refuse(const std::string& sentence) {
+        return Send("--" + output_.Boundary() + "\r\nContent-Type: text/plain\r\nContent-Length: " +
+                    std::to_string(sentence.size()) + "\r\n\r\n" + sentence + "\r\n");
+    }
+
     bool End() { return Send("--" + output_.Boundary() + "--\r\n"); }
 
   private:
@@ -158,16 +171,20 @@ bool Await(const Call& call, Clock::time_point due) {
     return !MustEnd(call);
 }
 
-// False when the stream must end early, or goes on in another codec.
+// False when the stream must end early. Throws Failure 406 where it goes on in another codec.
 bool SendAll(const Call& call, archive::RecordingReader& recording, media::RecordedMedia& media, const Pace& pace,
              Parts& parts) {
     const std::string codec = media.VideoCodec();
-    for (;;) {
+    for (std::int64_t before_ms = std::numeric_limits<std::int32_t>::min();;) {
         const std::optional<media::RecordedPacket> packet = media.Next();
+        if (media.VideoCodec() != codec) {
+            throw NotStreamed(media.VideoCodec());
+        }
         if (packet) {
-            if (media.VideoCodec() != codec || !Await(call, pace.Of(packet->time_ms)) || !parts.Add(media, *packet)) {
+            if (!Await(call, pace.Of(before_ms)) || !parts.Add(media, *packet)) {
                 return false;
             }
+            before_ms = packet->medium == base::Medium::kVideo ? packet->time_ms : before_ms;
         } else if (!recording.Grows()) {
             return true;
         } else if (!Await(call, Clock::now() + kTailPoll)) {
@@ -211,8 +228,13 @@ std::string Stream(const Call& call) {
     call.context.NoteStream();
     Parts parts(call);
     parts.Begin();
-    if (SendAll(call, recording, media, Pace(recording.At(from).time_ms, speed), parts)) {
-        parts.End();
+    const Pace pace(recording.At(from).time_ms, speed);
+    try {
+        if (Readable([&] { return SendAll(call, recording, media, pace, parts); })) {
+            parts.End();
+        }
+    } catch (const Failure& failure) {
+        parts.Refuse(failure.what());
     }
     return "";
 }

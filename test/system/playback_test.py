@@ -147,6 +147,29 @@ class PlaybackTest(unittest.TestCase):
             self.assertGreater(walked["stills"], 1)
             self.assertEqual(walked["complaints"], [])
 
+    def test_a_visit_plays_video_as_it_was_recorded(self):
+        h264 = self.finished(2)
+        events = {"H264_EVENT": str(h264["id"]), "MJPEG_EVENT": str(self.event["id"])}
+        with Visit("recorded_video.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", **events) as visit:
+            def see(step, event=h264):
+                seen = visit.see(step)
+                painted = self.reader.read([base64.b64decode(seen["picture"])])[0]
+                self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
+                clock = time.strftime("%H:%M:%S", time.gmtime(event["start"] + painted // 25))
+                self.assertEqual(seen["caption"].split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
+                return seen
+
+            paused = see("paused")
+            self.assertGreater(paused["video"], 20)
+            self.assertEqual(paused["pictures"], 0)
+            self.assertEqual(see("stepped")["told"], paused["told"] + 1)
+            for step in ("heard", "twice as fast"):
+                self.assertEqual(see(step)["pictures"], 0)
+            self.assertEqual(see("four times as fast")["video"], 0)
+            jpeg = see("motion jpeg", self.event)
+            self.assertEqual(jpeg["video"], 0)
+            self.assertEqual(jpeg["complaints"], [])
+
     def mark(self, kind):
         """One of camera 1, and the recording that it lies in."""
         mark = self.server.request(call("VEXO.Event", "List", kind=kind, cameralists=1), "admin").json["data"]["event"][0]

@@ -63,6 +63,8 @@ export class AudioPlayer {
   #exists = false;
   #lastUs = 0;
   #error = "";
+  /** How many times as fast as life it is played. The stream's time passes as slowly for what is heard. */
+  speed = 1;
 
   /** `changed` is called when existence, state or error of the sound has changed. */
   constructor(changed: () => void) {
@@ -135,7 +137,7 @@ export class AudioPlayer {
       if (!this.#decoder) {
         const timestamps = (this.#timestamps = new TimestampMatcher());
         this.#decoder = new AudioDecoder({
-          output: (decoded) => speaker.send(chunkOf(decoded, timestamps.decoded(decoded.timestamp))),
+          output: (decoded) => speaker.send(chunkOf(decoded, timestamps.decoded(decoded.timestamp), this.speed)),
           error: () => this.#fail("The sound cannot be decoded"),
         });
         this.#decoder.configure(config);
@@ -158,13 +160,13 @@ export class AudioPlayer {
   }
 }
 
-function chunkOf(decoded: AudioData, timestampUs: number): SpeakerCommand {
+function chunkOf(decoded: AudioData, timestampUs: number, speed: number): SpeakerCommand {
   const channels = Array.from({ length: Math.min(decoded.numberOfChannels, 2) }, (_, planeIndex) => {
     const samples = new Float32Array(decoded.numberOfFrames);
     decoded.copyTo(samples, { planeIndex, format: "f32-planar" });
     return samples;
   });
-  const chunk = { timestampUs, rate: decoded.sampleRate, channels };
+  const chunk = { timestampUs: timestampUs / speed, rate: decoded.sampleRate * speed, channels };
   decoded.close();
   return chunk;
 }

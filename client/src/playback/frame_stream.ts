@@ -16,7 +16,8 @@ export interface RecordedFrame {
   index: number;
   /** Unix milliseconds at which the camera's picture was taken in. */
   capturedMs: number;
-  jpeg: Blob;
+  /** A JPEG, or what was decoded, until the frame is taken; null for the one before, which stays. */
+  picture: Blob | VideoFrame | null;
 }
 
 /**
@@ -69,5 +70,5 @@ function indexOf(part: Part, before: number): number {
 function frameOf({ headers, body }: Part, index: number): RecordedFrame {
   const capturedMs = Math.round(Number(headers.get("x-capture-time")) * 1000);
   if (!(capturedMs > 0)) throw new MultipartError("a picture without its time");
-  return { index, capturedMs, jpeg: new Blob([body], { type: "image/jpeg" }) };
+  return { index, capturedMs, picture: new Blob([body], { type: "image/jpeg" }) };
 }

@@ -2,15 +2,15 @@
 //
 // Plays footage from a frame on to its end, in as many streams as that takes.
 //
-// Why so        The stream of a finished recording repeats its last frame for ever; the first repeat is the end. That
-//               of a growing recording continues as it grows, and ends with it. Where the connection is lost, another
-//               stream goes on from the frame on the screen.
+// Why so        The stream of a growing recording continues as it grows, and ends with it. Where the connection is
+//               lost, another stream goes on from the frame on the screen.
 
 import { delay } from "../wire/delay";
 import { newStreamKey, type Recordings } from "../wire/recordings";
 import { asServerError, ServerError } from "../wire/server";
 import { isPassing } from "./failure_reason";
-import { kMaxSilenceMs, readFrames, type RecordedFrame } from "./frame_stream";
+import type { FootageStream } from "./footage_stream";
+import { kMaxSilenceMs, type RecordedFrame } from "./frame_stream";
 import type { OpenFootage } from "./open_footage";
 import { kMaxFrameMs, type ShownFrame } from "./shown_frame";
 import { streamEnd } from "./stream_end";
@@ -32,14 +32,17 @@ export interface PlaybackSink {
 
 export class Playback {
   readonly #recordings: Recordings;
+  readonly #streams: FootageStream;
   readonly #opened: OpenFootage;
   readonly #sink: PlaybackSink;
   #rate: number;
+  #isStreaming = false;
   /** Of the stream that sends frames; 0 while none does. */
   #key = 0;
 
-  constructor(recordings: Recordings, opened: OpenFootage, rate: number, sink: PlaybackSink) {
+  constructor(recordings: Recordings, streams: FootageStream, opened: OpenFootage, rate: number, sink: PlaybackSink) {
     this.#recordings = recordings;
+    this.#streams = streams;
     this.#opened = opened;
     this.#rate = rate;
     this.#sink = sink;
@@ -60,56 +63,52 @@ export class Playback {
     return null;
   }
 
-  /** Changes a running stream without interruption; rejects where the server cannot do that. */
+  /** Changes a running stream without interruption; rejects where that takes another playback. */
   async setRate(rate: number): Promise<void> {
     this.#rate = rate;
+    if (this.#isStreaming && !this.#streams.canChangeTo(rate)) throw new Error("another stream is needed");
     if (this.#key !== 0) await this.#recordings.setRate(this.#key, rate);
   }
 
   async #playStream(from: number, signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
     const { shown } = this.#sink;
+    this.#isStreaming = true;
     try {
-      return (await this.#showFrames(from, signal)) ? "ended" : await this.#whatFollows(signal);
+      return await this.#whatFollows(await this.#showFrames(from, signal), signal);
     } catch (error) {
       const failure = asServerError(error);
       // A stream that has shown a picture can be had again.
       if (shown.hasBegun && isPassing(failure)) return "lost";
       throw failure;
     } finally {
+      this.#isStreaming = false;
       this.#key = 0;
     }
   }
 
-  /** Resolves with whether the last frame came; else the server ended the stream before. */
-  async #showFrames(from: number, signal: AbortSignal): Promise<boolean> {
-    const { footage } = this.#opened;
-    const extent = footage.isGrowing ? "growing" : "all";
+  /** Resolves with whether the stream is known to have ended behind the last frame. */
+  #showFrames(from: number, signal: AbortSignal): Promise<boolean> {
     const key = newStreamKey();
     const rate = this.#rate;
-    let before = -1;
-    let isAtEnd = false;
-    await readFrames(
-      (until) => this.#recordings.play(footage, { index: from }, extent, rate, key, until),
+    return this.#streams.read(
+      this.#opened.footage,
+      { index: from, rate, key },
       async (frame) => {
-        isAtEnd = frame.index === before && !footage.isGrowing;
-        if (isAtEnd) return false;
         // The rate may have been changed while the stream was being opened.
-        if (before < 0 && this.#rate !== rate) this.#recordings.setRate(key, this.#rate).catch(() => undefined);
+        if (this.#key === 0 && this.#rate !== rate) this.#recordings.setRate(key, this.#rate).catch(() => undefined);
         this.#key = key;
-        before = frame.index;
         await this.#sink.take(frame);
         return !signal.aborted;
       },
       signal,
       kMaxSilenceMs + kMaxFrameMs * Math.max(0, -rate),
     );
-    return isAtEnd;
   }
 
   /** After the server has ended the stream. */
-  async #whatFollows(signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
+  async #whatFollows(isWhole: boolean, signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
     const { index, ageMs } = this.#sink.shown;
-    const last = { index, ageMs, rate: this.#rate, frameCount: this.#opened.frameCount };
+    const last = { index, ageMs, rate: this.#rate, frameCount: this.#opened.frameCount, isWhole };
     const end = await streamEnd(this.#recordings, this.#opened.footage, last);
     if (signal.aborted || end.kind === "lost") return "lost";
     if (end.kind === "removed") throw new ServerError(404, 0, "");

@@ -6,10 +6,12 @@
 //               and every seek opens another. While paused there is no connection at all. A held key or a dragged
 //               playhead asks for more frames than can be fetched: then only the last is.
 
+import type { AudioPlayer } from "../live/audio_player";
 import { isSameFootage, type Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import { asServerError } from "../wire/server";
 import { reasonOf } from "./failure_reason";
+import { FootageStream } from "./footage_stream";
 import type { RecordedFrame } from "./frame_stream";
 import { OpenFootage } from "./open_footage";
 import { Playback, type PlaybackSink } from "./playback";
@@ -37,10 +39,12 @@ export class Player {
   #opening: Start | null = null;
   /** While stills are being fetched: the one that was requested last. */
   #wanted: Start | null = null;
+  readonly #streams: FootageStream;
 
   /** `changed` is called with every frame and every other change. */
   constructor(recordings: Recordings, changed: () => void) {
     this.#recordings = recordings;
+    this.#streams = new FootageStream(recordings, changed);
     this.#changed = changed;
   }
 
@@ -59,6 +63,10 @@ export class Player {
 
   get rate(): number {
     return this.#rate;
+  }
+
+  get sound(): AudioPlayer {
+    return this.#streams.sound.player;
   }
 
   /** How many frames there are; 0 when that is not known. */
@@ -121,7 +129,8 @@ export class Player {
     this.#changed();
     const playback = this.#playback;
     playback?.setRate(rate).catch(() => {
-      if (playback === this.#playback && this.#state.kind === "playing") void this.#play({ index: this.index });
+      const isRunning = this.#state.kind === "playing" || this.#state.kind === "opening";
+      if (playback === this.#playback && isRunning) void this.#play(this.#opening ?? { index: this.index });
     });
   }
 
@@ -184,7 +193,7 @@ export class Player {
       const first = await opened.locate(start);
       if (signal.aborted) return;
       this.#opening = first;
-      this.#playback = new Playback(this.#recordings, opened, this.#rate, this.#sink(signal));
+      this.#playback = new Playback(this.#recordings, this.#streams, opened, this.#rate, this.#sink(signal));
       const end = await this.#playback.run(first.index, signal);
       if (end) this.#become({ kind: end });
     } catch (error) {

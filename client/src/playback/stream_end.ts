@@ -28,16 +28,19 @@ export interface LastFrame {
   rate: number;
   /** Of the whole footage, as far as is known. */
   frameCount: number;
+  /** The server says that there is nothing more. */
+  isWhole: boolean;
 }
 
 /** `before` is the footage as it was known while the stream ran. */
 export async function streamEnd(recordings: Recordings, before: Footage, last: LastFrame): Promise<StreamEnd> {
-  const wasAtTail = before.isGrowing && last.ageMs >= kTailSilenceMs;
+  if (last.isWhole && !before.isGrowing) return { kind: "ended", footage: before };
+  const wasAtTail = last.isWhole || (before.isGrowing && last.ageMs >= kTailSilenceMs);
   const footage = await recordings.find(before).catch((error: ServerError) => (isPassing(error) ? "lost" : before));
   if (footage === "lost") return { kind: "lost" };
   if (!footage) return { kind: "removed" };
   if (!wasAtTail) return { kind: "preempted", footage };
   const frameCount = Math.max(last.frameCount, footage.frameCount);
-  const isAtEnd = !footage.isGrowing && last.index + Math.max(1, last.rate) >= frameCount;
+  const isAtEnd = !footage.isGrowing && (last.isWhole || last.index + Math.max(1, last.rate) >= frameCount);
   return { kind: isAtEnd ? "ended" : "more", footage };
 }

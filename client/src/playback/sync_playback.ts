@@ -23,7 +23,7 @@ export class SyncPlayback {
   readonly #changed: () => void;
   readonly #skipped: (seconds: number) => void;
   readonly #tracks: Tracks;
-  #active: Track | null = null;
+  #activeTrack: Track | null = null;
   #playheadMs: number | null = null;
   #isPlaying = false;
   #isScrubbed = false;
@@ -42,6 +42,19 @@ export class SyncPlayback {
     this.#lookup = new FootageLookup(recordings, cache);
     this.#changed = changed;
     this.#skipped = skipped;
+  }
+
+  get #active(): Track | null {
+    return this.#activeTrack;
+  }
+
+  /** Where its sound was on, that of the next one is. */
+  set #active(track: Track | null) {
+    const before = this.#activeTrack;
+    this.#activeTrack = track;
+    if (track === before || !before?.player.sound.isOn) return;
+    before.player.sound.switchOff();
+    void track?.player.sound.switchOn();
   }
 
   get tracks(): readonly Track[] {
@@ -140,6 +153,13 @@ export class SyncPlayback {
     this.#isPlaying = false;
     this.#tracks.pause();
     this.#changed();
+  }
+
+  /** Of the active camera. Call it while handling a click or key. */
+  toggleSound(): void {
+    const sound = this.#active?.player.sound;
+    if (sound?.isOn) sound.switchOff();
+    else void sound?.switchOn();
   }
 
   /** Pauses, and moves by frames of the active camera. */

@@ -61,6 +61,7 @@ export class Tracks {
       if (this.#all.includes(track)) continue;
       this.clock.leave(track);
       track.player.close();
+      track.player.sound.switchOff();
     }
     return this.#all.filter((track) => !before.includes(track));
   }
@@ -99,7 +100,10 @@ export class Tracks {
 
   close(): void {
     this.clock.set(0, false);
-    for (const { player } of this.#all) player.close();
+    for (const { player } of this.#all) {
+      player.close();
+      player.sound.switchOff();
+    }
   }
 
   #enter(track: Track, { start, stop, frameCount }: Footage, atMs: number): void {

@@ -46,6 +46,11 @@ export class MultipartParser {
     this.#deliver = deliver;
   }
 
+  /** Whether the boundary has come behind which there are no more parts. */
+  get hasEnded(): boolean {
+    return this.#ended;
+  }
+
   /** Takes the next bytes of the body. Throws MultipartError; do not use the parser after that. */
   push(chunk: Uint8Array): void {
     let at = 0;

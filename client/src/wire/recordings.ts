@@ -41,6 +41,14 @@ export interface FrameStart {
   from?: number;
 }
 
+/** `codecs`: of H264 and H265, joined by a comma. */
+export interface VideoStart {
+  index: number;
+  rate: number;
+  key: number;
+  codecs: string;
+}
+
 /** A place in the order of events, and which events are looked for from there. */
 export interface EventCursor {
   cameras: readonly number[];
@@ -238,6 +246,19 @@ export class Recordings {
       throw asServerError(error);
     }
     throw new ServerError(200, 0, "The recording cannot be played.");
+  }
+
+  /**
+   * Opens a stream of what was recorded, from the key frame on that the frame is decoded from, where it is of one of
+   * these codecs. The caller reads the body and ends it with `signal`. Rejects with a ServerError; its status is 406
+   * where the recording has to be played as pictures.
+   */
+  async stream({ kind, id }: FootageRef, start: VideoStart, signal: AbortSignal): Promise<Response> {
+    const which = { event: String(id), ...kindParameter(kind), frame: String(start.index) };
+    const how = { rate: String(start.rate), timestamp: String(start.key), codecs: start.codecs };
+    return this.#server.media("VEXO.Event", "Stream", { ...which, ...how }, { signal }).catch((error: unknown) => {
+      throw asServerError(error);
+    });
   }
 
   /** Rejects where no stream of this key runs. */

@@ -41,6 +41,8 @@ export class FakeArchive {
   readonly streams: Stream[] = [];
   /** Each stream that was asked for: event, where from, how far, rate. */
   readonly asked: string[] = [];
+  /** Each that was refused, since it has to be played as pictures. */
+  readonly refused: string[] = [];
   /** The events of which a still was asked for. */
   readonly stills: string[] = [];
   playersPerSession = 1;
@@ -49,6 +51,8 @@ export class FakeArchive {
   /** The server does not answer. */
   isAway = false;
   framesPerSecond = 100;
+  /** Recordings are H.264, with key frames ten frames apart; else they are Motion JPEG. */
+  isVideo = false;
   /** Every frame of every recording. */
   picture: Uint8Array = Uint8Array.of(255, 216);
 
@@ -123,6 +127,14 @@ export class FakeArchive {
         if (stream) stream.rate = number("rate");
         return stream ? json(null) : json(null, 404);
       }
+      case "VEXO.Event Stream": {
+        const kind = query.get("kind") ?? "event";
+        const found = this.recorded.find((one) => one.id === number("event") && (one.kind ?? "event") === kind);
+        const list = found && this.isVideo ? this.asked : this.refused;
+        list.push(`${kind}${number("event")} video ${number("frame")} at ${number("rate")}`);
+        if (!found || !this.isVideo) return json(null, found ? 406 : 404);
+        return this.#stream(found, number("frame"), Infinity, number("timestamp"), number("rate"), true, signal, true);
+      }
       case "VEXO.Lookhaven.Player PlayMjpegEvent":
         return this.#play(query, signal);
       default:
@@ -181,7 +193,7 @@ export class FakeArchive {
     return this.#stream(found, from, stop < from ? found.frames - 1 : stop, number("timestamp", 0), rate, query.has("interval"), signal);
   }
 
-  #stream(found: Recorded, from: number, stop: number, key: number, rate: number, isSampled: boolean, signal?: AbortSignal) {
+  #stream(found: Recorded, from: number, stop: number, key: number, rate: number, isSampled: boolean, signal?: AbortSignal, isVideo = false) {
     const ended = new AbortController();
     const lost = new AbortController();
     let isStalled = false;
@@ -197,15 +209,22 @@ export class FakeArchive {
     ended.signal.addEventListener("abort", () => this.streams.splice(this.streams.indexOf(stream), 1));
     signal?.addEventListener("abort", () => ended.abort());
     const send = async (controller: ReadableStreamDefaultController<Uint8Array>) => {
-      for (let index = from; !ended.signal.aborted; ) {
+      for (let index = isVideo ? from - (from % 10) : from; !ended.signal.aborted; ) {
         // A browser that does not read holds the server back.
         if (!isStalled && (controller.desiredSize ?? 0) > -20) {
-          controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
           const captured = `X-Capture-Time: ${(found.start + (index * periodMs(found)) / 1000).toFixed(3)}\r\n`;
-          controller.enqueue(part("image/jpeg", this.picture, captured));
+          if (!isVideo) controller.enqueue(part("text/plain", Buffer.from(`${index}\r\n`)));
+          if (isVideo) controller.enqueue(videoPart(index, periodMs(found), captured));
+          else controller.enqueue(part("image/jpeg", this.picture, captured));
           index = Math.min(stop, index + Math.max(1, isSampled ? 1 : stream.rate));
         }
         await wait((1000 / this.framesPerSecond) * Math.max(1, -stream.rate));
+        if (isVideo && index >= found.frames) {
+          while (found.isGrowing && index >= found.frames && !ended.signal.aborted) await wait(5);
+          if (index < found.frames || ended.signal.aborted) continue;
+          controller.enqueue(Buffer.from(`--${kBoundary}--\r\n`));
+          ended.abort();
+        }
         // At the end of what is still being recorded the server waits a while, and then ends the stream.
         if (index >= found.frames) await wait(kTailMs);
         if (index >= found.frames) ended.abort();
@@ -236,7 +255,16 @@ function periodMs({ start, stop, frames }: Recorded): number {
   return ((stop - start) * 1000) / frames;
 }
 
-function part(type: string, body: Uint8Array, more = ""): Uint8Array {
+const kKeyFrame = Uint8Array.of(0, 0, 0, 1, 0x67, 0x42, 0xc0, 0x1e, 0, 0, 0, 1, 0x65, 0x88);
+const kOtherFrame = Uint8Array.of(0, 0, 0, 1, 0x41, 0x9a);
+
+/** A frame of H.264 without a picture. */
+export function videoPart(index: number, periodMs: number, more: string): Uint8Array {
+  const timestamp = `X-Frame: ${index}\r\nX-Timestamp: ${Math.round(index * periodMs * 1000)}\r\n`;
+  return part("image/H264", index % 10 === 0 ? kKeyFrame : kOtherFrame, more + timestamp);
+}
+
+export function part(type: string, body: Uint8Array, more = ""): Uint8Array {
   const head = Buffer.from(`--${kBoundary}\r\nContent-Type: ${type}\r\nContent-Length: ${body.length}\r\n${more}\r\n`);
   return Buffer.concat([head, body, Buffer.from("\r\n")]);
 }

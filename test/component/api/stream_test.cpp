@@ -8,8 +8,10 @@
 #include <sstream>
 
 #include "standalone/archive/layout.h"
+#include "standalone/archive/span_file.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/text.h"
+#include "standalone/store/marks.h"
 #include "standalone/store/settings.h"
 #include "test/component/api/event_fixture.h"
 #include "test/component/api/stream_reader.h"
@@ -233,6 +235,26 @@ TEST_F(StreamApi, FollowsAnEventUntilItEnds) {
     const Parts parts(head.substr(type, head.find("\r\n", type) - type), stream.text.substr(head_end + 4));
     EXPECT_EQ(parts.Count(true), 100U);
     EXPECT_TRUE(parts.is_whole);
+}
+
+TEST_F(StreamApi, SaysWhyItDoesNotGoOn) {
+    const int event = Record(1, test::kH264);
+    const int other = Record(1, test::kH265);
+    const int alert = footage_.Mark(1, 1, kNoon, 8, "door", event);
+    const std::filesystem::path first = footage_.FileOf(event), second = footage_.FileOf(other);
+    const auto name = [](const std::filesystem::path& path) { return path.parent_path().filename() / path.filename(); };
+    archive::WriteSpan(footage_.Mount() / store::Marks(footage_.Records()).Find(store::MarkKind::kAlert, alert)->path,
+                       {kNoon * 1000, (kNoon + 8) * 1000, {name(first), name(second)}});
+    const Parts span(Ask(Query(alert, "&kind=alert&rate=4")));
+    ASSERT_FALSE(span.all.empty());
+    EXPECT_EQ(span.Count(true), 100U);
+    EXPECT_FALSE(span.is_whole);
+    EXPECT_EQ(span.all.back().body, "footage in H265 is not streamed to this client: play its pictures");
+    StreamReader stream = Open(Query(event, "&rate=-2"));
+    EXPECT_TRUE(Holds(stream, "X-Frame: 0\r\n"));
+    std::filesystem::resize_file(first, 1000);
+    EXPECT_TRUE(Ends(stream));
+    EXPECT_NE(stream.text.find("\r\n\r\nthe recording cannot be read\r\n"), std::string::npos);
 }
 
 TEST_F(StreamApi, GoesNoFasterThanItsRateAndABit) {

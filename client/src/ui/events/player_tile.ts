@@ -38,7 +38,7 @@ export class PlayerTile {
 
   constructor(name: string, player: Player, actions: PlayerTileActions) {
     this.player = player;
-    player.show = ({ jpeg }, signal) => this.#draw(jpeg, () => !signal.aborted);
+    player.show = ({ picture }, signal) => this.#draw(picture, () => !signal.aborted);
     this.#again.addEventListener("click", actions.again);
     this.#large = iconButton("fit", `${name} large`, () => actions.enlarge(), "Enter");
     const close = iconButton("close", `Close ${name}`, () => actions.close());
@@ -105,14 +105,19 @@ export class PlayerTile {
     this.#still = undefined;
   }
 
-  async #draw(jpeg: Blob, isWanted: () => boolean): Promise<void> {
-    const image = await createImageBitmap(jpeg);
+  /** Null draws nothing: the picture stays. */
+  async #draw(picture: Blob | VideoFrame | null, isWanted: () => boolean): Promise<void> {
+    if (!(picture instanceof Blob)) return this.#put(picture, isWanted);
+    const image = await createImageBitmap(picture);
     // A pause while it was being decoded keeps the previous frame, whose number the player reports.
-    if (isWanted()) {
-      draw(this.#canvas, image);
-      this.root.classList.add("has-picture");
-    }
+    this.#put(image, isWanted);
     image.close();
+  }
+
+  #put(image: ImageBitmap | VideoFrame | null, isWanted: () => boolean): void {
+    if (!image || !isWanted()) return;
+    draw(this.#canvas, image);
+    this.root.classList.add("has-picture");
   }
 }
 

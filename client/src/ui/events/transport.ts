@@ -28,6 +28,8 @@ export interface TransportActions {
   sameMoment(): void;
   live(): void;
   exportSpan(): void;
+  /** Turns the sound of the active camera on or off. */
+  sound(): void;
   fullScreen(): void;
 }
 
@@ -46,6 +48,7 @@ export class Transport {
   readonly #before: HTMLButtonElement;
   readonly #after: HTMLButtonElement;
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
+  readonly #sound: HTMLButtonElement;
   readonly #time = element("time", { class: "transport-time" }, kNoTime);
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
@@ -69,6 +72,9 @@ export class Transport {
     this.#play = iconButton("play", "Play", () => actions.toggle(), "Space");
     this.#play.classList.add("play");
     this.#play.append(icon("pause"));
+    this.#sound = iconButton("soundOff", "Sound", () => actions.sound());
+    this.#sound.classList.add("transport-sound");
+    this.#sound.append(icon("soundOn"));
     this.#download.append(icon("download"));
     for (const rate of kRates) this.#rate.append(element("option", { value: String(rate) }, rateText(rate)));
     this.#rate.addEventListener("change", () => actions.rate(Number(this.#rate.value)));
@@ -83,6 +89,7 @@ export class Transport {
       iconButton("jumpForward", "Ten seconds on", () => actions.jump(kJumpMs), "L"),
       this.#after,
       this.#rate,
+      this.#sound,
     );
     const goTo = element("button", { type: "button", class: "transport-go", title: `${kNoTime} (T)` }, this.#time);
     goTo.addEventListener("click", () => actions.askTime());
@@ -117,6 +124,7 @@ export class Transport {
     const frameCount = active?.player.frameCount ?? 0;
     const frames = footage && frameCount > 0 && !footage.isGrowing ? ` of ${frameCount}` : "";
     setText(this.#frame, footage ? `frame ${(active?.player.index ?? 0) + 1}${frames}` : "");
+    this.#showSound();
     this.#keeping.show(footage);
     const mayDownload = !footage || !this.#denied.has(footage.camera);
     if (footage && mayDownload) this.#download.href = downloadAddress(footage);
@@ -130,6 +138,13 @@ export class Transport {
   deny(denied: ReadonlySet<number>): void {
     this.#denied = denied;
     this.refresh();
+  }
+
+  #showSound(): void {
+    const { exists = false, isOn = false, error = "" } = this.#playback.active?.player.sound ?? {};
+    this.#sound.hidden = !exists;
+    this.#sound.setAttribute("aria-pressed", String(isOn));
+    this.#sound.title = error || `Turn the sound ${isOn ? "off" : "on"} (M)`;
   }
 
   #name(button: HTMLButtonElement, what: string, event: Footage | null | undefined, key: string): void {

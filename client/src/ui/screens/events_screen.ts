@@ -87,6 +87,7 @@ export class EventsScreen extends Screen {
     rate: (rate) => this.#playback.setRate(rate),
     changeRate: (by) => this.#changeRate(by),
     exportSpan: () => this.#toggleExport(),
+    sound: () => this.#toggleSound(),
     fullScreen: toggleFullScreen,
   };
   /** Counts what the address has asked for; while it is being looked up, the address is not written. */
@@ -259,6 +260,12 @@ export class EventsScreen extends Screen {
     this.progress.hidden = !cache.isBusy && (cameras.length > 0 || error !== "");
     setText(this.#status, error || empty);
     this.#status.classList.toggle("alarm", error !== "");
+  }
+
+  #toggleSound(): void {
+    const error = this.#playback.active?.player.sound.error;
+    if (error) notify(`${error}.`);
+    this.#playback.toggleSound();
   }
 
   #togglePlaying(): void {

@@ -1,0 +1,107 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Decodes recorded video, frame by frame, into pictures in the order in which they are shown.
+//
+// Why so        A decoder holds frames back until it knows their order, and takes some time: so it is fed until enough
+//               pictures are ready, and its frames are known by their timestamps.
+
+import { frameInfoOf, type VideoCodec } from "../live/annexb";
+import { ServerError } from "../wire/server";
+
+/** The server's status for what this client has to have as pictures. */
+export const kNotStreamed = 406;
+/** Each takes some megabytes. */
+const kMaxReady = 3;
+const kMaxQueued = 4;
+
+/** What the server says of a frame. */
+export interface FrameFacts {
+  index: number;
+  capturedMs: number;
+  timestampUs: number;
+}
+
+export interface DecodedFrame extends FrameFacts {
+  /** Whoever takes the frame closes it. */
+  picture: VideoFrame;
+}
+
+export class VideoDecoding {
+  readonly #changed: () => void;
+  readonly #facts = new Map<number, FrameFacts>();
+  readonly #ready: DecodedFrame[] = [];
+  #decoder: VideoDecoder | null = null;
+  #codecString = "";
+  #failure: ServerError | null = null;
+
+  /** `changed` is called when a picture is ready, there is room again, or decoding has failed. */
+  constructor(changed: () => void) {
+    this.#changed = changed;
+  }
+
+  get hasRoom(): boolean {
+    return this.#ready.length < kMaxReady && (this.#decoder?.decodeQueueSize ?? 0) < kMaxQueued;
+  }
+
+  /** Takes the next frame, the first one a key frame. Without facts it is not shown. Rejects with a ServerError. */
+  async decode(codec: VideoCodec, timestampUs: number, data: Uint8Array, facts: FrameFacts | null): Promise<void> {
+    const { isKey, codecString } = frameInfoOf(codec, data);
+    if (isKey && codecString && codecString !== this.#codecString) await this.#configure(codecString);
+    if (this.#failure) throw this.#failure;
+    if (!this.#decoder) return;
+    if (facts) this.#facts.set(timestampUs, facts);
+    try {
+      this.#decoder.decode(new EncodedVideoChunk({ type: isKey ? "key" : "delta", timestamp: timestampUs, data }));
+    } catch {
+      throw undecodable();
+    }
+  }
+
+  /** The next picture that is ready. Throws a ServerError where there will be none. */
+  take(): DecodedFrame | undefined {
+    if (this.#failure && this.#ready.length === 0) throw this.#failure;
+    return this.#ready.shift();
+  }
+
+  /** Makes all pictures ready; the next frame must be a key frame. */
+  async finish(): Promise<void> {
+    if (this.#decoder?.state === "configured") await this.#decoder.flush().catch(() => undefined);
+  }
+
+  close(): void {
+    if (this.#decoder && this.#decoder.state !== "closed") this.#decoder.close();
+    this.#decoder = null;
+    for (const { picture } of this.#ready.splice(0)) picture.close();
+  }
+
+  async #configure(codec: string): Promise<void> {
+    const config = { codec };
+    const { supported } = await VideoDecoder.isConfigSupported(config);
+    if (!supported) throw new ServerError(kNotStreamed, 0, "This browser cannot play the recording.");
+    await this.finish();
+    if (this.#decoder?.state === "configured") this.#decoder.close();
+    const decoder = new VideoDecoder({
+      output: (picture) => this.#receive(picture),
+      error: () => {
+        this.#failure = undecodable();
+        this.#changed();
+      },
+    });
+    decoder.addEventListener("dequeue", () => this.#changed());
+    decoder.configure(config);
+    this.#decoder = decoder;
+    this.#codecString = codec;
+  }
+
+  #receive(picture: VideoFrame): void {
+    const facts = this.#facts.get(picture.timestamp);
+    this.#facts.delete(picture.timestamp);
+    if (!facts || !this.#decoder) return picture.close();
+    this.#ready.push({ ...facts, picture });
+    this.#changed();
+  }
+}
+
+function undecodable(): ServerError {
+  return new ServerError(kNotStreamed, 0, "The recording cannot be decoded.");
+}
