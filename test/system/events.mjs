@@ -92,12 +92,15 @@ await visit(async (page, complaints) => {
   await page.keyboard.press("ArrowDown");
   await page.locator(".notice.shown").waitFor();
   await settled("paused");
-  await page.locator(".row-still.loaded").nth(1).waitFor();
+  const stills = await page.waitForFunction(() => {
+    const { length } = document.querySelectorAll(".row-still.loaded");
+    return length > 1 ? length : null;
+  });
   await page.screenshot({ path: `${folder}/walked.png` });
   await report("walked", {
     address: await page.evaluate(() => location.hash),
     notice: await text(".notice"),
-    stills: await page.locator(".row-still.loaded").count(),
+    stills: await stills.jsonValue(),
     complaints,
   });
 });
