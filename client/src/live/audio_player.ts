@@ -11,6 +11,8 @@ export type AudioPart = Extract<MediaPart, { kind: "audio" }>;
 
 /** Some seconds of audio. */
 const kMaxQueued = 200;
+/** Longer than a headset takes to wake up. */
+const kMaxStartMs = 8_000;
 /** Longer than any chunk of audio. */
 const kMaxGapUs = 300_000;
 
@@ -26,7 +28,9 @@ class Speaker {
   }
 
   async start(): Promise<void> {
-    await this.#context.resume();
+    // Where there is no sound device, Firefox waits for one without end.
+    const late = new Promise<never>((_, reject) => setTimeout(reject, kMaxStartMs));
+    await Promise.race([this.#context.resume(), late]);
     await this.#context.audioWorklet.addModule(workletAddress);
     this.#node = new AudioWorkletNode(this.#context, "speaker", { numberOfInputs: 0, outputChannelCount: [2] });
     this.#node.port.onmessage = ({ data }: MessageEvent<SpeakerReport>) =>
@@ -96,7 +100,7 @@ export class AudioPlayer {
       await speaker.start();
     } catch {
       // Switching off meanwhile makes the start fail as well.
-      if (this.#speaker === speaker) this.#fail("This browser plays no sound");
+      if (this.#speaker === speaker) this.#fail("The browser plays no sound: is there a sound device?");
     }
   }
 

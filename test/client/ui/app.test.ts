@@ -7,7 +7,7 @@ import { hasBrowser, ServedClient } from "../support/served_client";
 
 /** What the window cuts off: controls, and texts that inform. Runs in the page. */
 function cut(): (string | null)[] {
-  const texts = ".bar-status, .bar-clock, .transport-time, .large-state";
+  const texts = ".bar-status, .bar-clock, .transport-about, .large-state";
   const isCut = (one: Element) => {
     const { left, right, top, bottom } = one.getBoundingClientRect();
     const isClipped = one.scrollWidth > one.clientWidth + 1 || one.scrollHeight > one.clientHeight + 1;
@@ -30,7 +30,7 @@ async function settledFrame(page: Page): Promise<string> {
   }
 }
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
   const { server } = client;
 

@@ -38,7 +38,8 @@ export class PlayerTile {
 
   constructor(name: string, player: Player, actions: PlayerTileActions) {
     this.player = player;
-    player.show = ({ picture }, signal) => this.#draw(picture, () => !signal.aborted);
+    // What a pause still asked for may come when the playhead is dragged already.
+    player.show = ({ picture }, signal) => this.#draw(picture, () => !signal.aborted && this.#still === undefined);
     this.#again.addEventListener("click", actions.again);
     this.#large = iconButton("fit", `${name} large`, () => actions.enlarge(), "Enter");
     const close = iconButton("close", `Close ${name}`, () => actions.close());

@@ -18,7 +18,8 @@ export interface PanZoomActions {
 const kWheelZoomPerPx = 0.0015;
 /** A trackpad's pinch comes as a wheel with Ctrl, in smaller steps. */
 const kPinchWheelFactor = 6;
-const kLinePx = 16;
+/** Firefox says three lines for the notch of a wheel that is 120 pixels to others. */
+const kLinePx = 40;
 /** A pointer that moved less than this has clicked. */
 const kClickPx = 5;
 /** Closer than this, two fingers tell no distance. */

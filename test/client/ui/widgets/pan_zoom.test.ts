@@ -23,7 +23,8 @@ beforeEach(() => {
 
 test.each([
   ["up zooms in where the pointer is", { deltaY: -100 }, ["zoom", 116, 20, 30]],
-  ["lines are more than pixels", { deltaY: 5, deltaMode: 1 }, ["zoom", 89, 20, 30]],
+  ["a notch of 120 pixels", { deltaY: 120 }, ["zoom", 84, 20, 30]],
+  ["a notch of three lines does the same", { deltaY: 3, deltaMode: 1 }, ["zoom", 84, 20, 30]],
   ["a trackpad's pinch is faster", { deltaY: -10, ctrlKey: true }, ["zoom", 109, 20, 30]],
   ["sideways pans", { deltaX: 40, deltaY: 10 }, ["pan", -40, 0]],
   ["Shift pans", { deltaY: 40, shiftKey: true }, ["pan", -40, 0]],
