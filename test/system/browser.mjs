@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // One visit: log in, see camera 1 move, take a snapshot, log out.
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { download } from "../support/browsers.mjs";
+import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 await visit(async (page, complaints) => {
   await page.goto(address);
@@ -28,11 +29,8 @@ await visit(async (page, complaints) => {
 
   await page.getByRole("button", { name: "Snapshot of Entrance" }).click();
   const dialog = page.getByRole("dialog", { name: "Snapshot" });
-  const saving = page.waitForEvent("download");
-  await dialog.getByRole("link", { name: "Download" }).click();
-  const download = await saving;
-  await download.saveAs(`${folder}/snapshot.jpg`);
-  await report("snapshot", { file: download.suggestedFilename() });
+  const file = await download(page, () => dialog.getByRole("link", { name: "Download" }).click(), folder);
+  await report("snapshot", { file });
   await dialog.getByRole("button", { name: "Close" }).click();
 
   await page.getByRole("button", { name: /^Entrance.*open large/ }).click();

@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Visits in Chromium: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine
+# Visits: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine
 # cameras of one moment. And what the server then still runs.
 import base64
 import json
@@ -99,9 +99,10 @@ class BrowserTest(unittest.TestCase):
                 self.assertEqual((states["1"], states["4"]), ("live", "live"))
                 self.assertGreater(len(self.server.requests()), len(self.idle), "nothing streams")
 
-                self.assertRegex(visit.see("snapshot")["file"], r"^Entrance.*\.jpe?g$")
+                file = visit.see("snapshot")["file"]
+                self.assertRegex(file, r"^Entrance.*\.jpe?g$")
                 probe = ["ffprobe", "-v", "error", "-show_entries", "stream=width,height", "-of", "csv=p=0"]
-                size = subprocess.run([*probe, f"{visit.folder}/snapshot.jpg"], capture_output=True, text=True, check=True)
+                size = subprocess.run([*probe, f"{visit.folder}/{file}"], capture_output=True, text=True, check=True)
                 self.assertEqual(size.stdout.strip(), "1280,720")
 
                 self.assertEqual(visit.see("logged out")["complaints"], [])

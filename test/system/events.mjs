@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps and a
-// jump; marks by their addresses, and on to the event after. EVENT_START and EVENT_MIDDLE are Unix seconds of a
+// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps, a jump
+// and a drag; marks by their addresses, on to the event after, and its export with another camera's. EVENT_START and EVENT_MIDDLE are Unix seconds of a
 // recording of camera 1, MARKS are addresses of marks within its recordings.
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { download } from "../support/browsers.mjs";
+import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 const start = Number(process.env.EVENT_START);
 const middle = Number(process.env.EVENT_MIDDLE);
@@ -17,11 +18,11 @@ await visit(async (page, complaints) => {
     await page.locator(states.map((state) => `.stage-picture:first-of-type[data-state="${state}"]`).join()).waitFor({ timeout: 15_000 });
   };
   const text = (selector) => page.locator(selector).first().textContent();
-  /** What the canvas shows, the frame that is told, and the second of the playhead. */
+  /** What the canvas shows, the frame that is told, if one is, and the second of the playhead. */
   const shown = () =>
     page.evaluate(() => ({
       picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
-      told: Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)[1]) - 1,
+      told: Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)?.[1]) - 1,
       time: document.querySelector(".transport-time").textContent,
       caption: document.querySelector(".stage-time").textContent,
     }));
@@ -47,7 +48,7 @@ await visit(async (page, complaints) => {
     const [here, before] = [await timeAt(x), await timeAt(x - 400)];
     scale = (here - before) / 400;
     await page.mouse.move(box.x + x, y);
-    await page.mouse.wheel((middle - here) / scale, 0);
+    await page.mouse.wheel(Math.round((middle - here) / scale), 0);
   };
   for (await aim(); scale > 0.2; await aim()) {
     for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
@@ -79,8 +80,27 @@ await visit(async (page, complaints) => {
   await settled("paused");
   await report("jumped", { ...(await shown()), by });
 
+  const axis = await page.locator(".timeline-axis").boundingBox();
+  const to = (seconds, options) => page.mouse.move(axis.x + x + seconds / scale, axis.y + 10, options);
+  await to(by);
+  await page.mouse.down();
+  const from = await text(".stage-time");
+  await to(-by);
+  // A picture of where the playhead is comes while the pointer is down.
+  await page.waitForFunction(([start, way]) => {
+    const seconds = (time) => time.split(" ").at(-1).split(":").reduce((sum, part) => sum * 60 + Number(part), 0);
+    const [playhead, picture] = [".transport-time", ".stage-time"].map((one) => seconds(document.querySelector(one).textContent));
+    return Math.abs(picture - playhead) < 1 && Math.abs(picture - seconds(start)) > way;
+  }, [from, by]);
+  await report("dragged", { ...(await shown()), by });
+  await page.mouse.up();
+  await settled("playing");
+  await page.keyboard.press(" ");
+  await settled("paused");
+  await report("let go", await shown());
+
   for (const mark of process.env.MARKS.split(",")) {
-    await page.goto(`${address}#${mark}`);
+    await page.evaluate((to) => void (location.hash = to), mark);
     const [kind, id] = mark.split("=");
     await page.locator(`.transport a[href*="event=${id}&kind=${kind}"]`).waitFor();
     await page.waitForFunction(() => /^frame ([5-9]|\d\d)/.test(document.querySelector(".transport-frame").textContent));
@@ -101,6 +121,15 @@ await visit(async (page, complaints) => {
     address: await page.evaluate(() => location.hash),
     notice: await text(".notice"),
     stills: await stills.jsonValue(),
-    complaints,
   });
+
+  await page.keyboard.press("x");
+  for (const name of ["Entrance", "Parking"]) {
+    const chip = page.locator(".export-panel .chip", { hasText: name });
+    if (!(await chip.locator("input").isChecked())) await chip.click();
+  }
+  await page.locator(".export-about", { hasText: "2 files in a ZIP" }).waitFor();
+  await page.screenshot({ path: `${folder}/export.png` });
+  const file = await download(page, () => page.locator(".export-panel a").click(), folder);
+  await report("exported", { file, complaints });
 });

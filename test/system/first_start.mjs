@@ -4,7 +4,7 @@
 // storage; then at a desk another camera with its plan, an account with few rights, a mount and a map; and what that
 // account sees. TOKEN is valid, OLD is not; RTSP and MJPEG are the cameras' addresses, DISK is an empty folder. At each
 // step on the phone, what axe-core finds.
-import { address, folder, report, violations, visit } from "./chromium.mjs";
+import { address, folder, report, violations, visit } from "./visit.mjs";
 
 const kWord = "a long night";
 
@@ -14,13 +14,14 @@ await visit(async (page, complaints) => {
     await page.screenshot({ path: `${folder}/${step.replace(" ", "-")}.png` });
     await report(step, { violations: await violations(page), complaints });
   };
+  const go = (hash) => page.evaluate((to) => void (location.hash = to), hash);
   const button = (name) => page.getByRole("button", { name }).click();
 
   await page.goto(address);
   await page.getByText("lookhaven setup-address").waitFor();
   await look("no account");
 
-  await page.goto(`${address}#setup=${process.env.OLD}`);
+  await go(`#setup=${process.env.OLD}`);
   await page.getByLabel("Account").fill("ada");
   await page.getByLabel("Password (").fill("correct horse");
   await page.getByLabel("Repeat").fill("correct horse");
@@ -28,7 +29,7 @@ await visit(async (page, complaints) => {
   await page.getByRole("alert").filter({ hasText: "replaced by a newer one" }).waitFor();
   await look("replaced");
 
-  await page.evaluate((token) => void (location.hash = `#setup=${token}`), process.env.TOKEN);
+  await go(`#setup=${process.env.TOKEN}`);
   await button("Create the account");
   await page.locator(".setup-steps [aria-current=step]", { hasText: "First camera" }).waitFor();
   await page.getByLabel("Address", { exact: true }).fill(process.env.RTSP);
@@ -50,7 +51,6 @@ await visit(async (page, complaints) => {
   await look("wall");
 
   await page.setViewportSize({ width: 1280, height: 800 });
-  const go = (hash) => page.evaluate((to) => void (location.hash = to), hash);
   await go("#settings=cameras&open=new");
   await page.getByLabel("Address", { exact: true }).fill(process.env.MJPEG);
   await button("Test connection");

@@ -2,7 +2,7 @@
 //
 // One visit to nine cameras of one moment: in step for a while and after changes of the rate, the playhead dragged, one
 // closed. CAMERAS are their ids, AT is the Unix time in milliseconds to begin at.
-import { address, folder, logIn, report, violations, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, violations, visit } from "./visit.mjs";
 
 await visit(async (page, complaints) => {
   const all = (state) => page.waitForFunction((wanted) => document.querySelectorAll(`.stage-picture${wanted}`).length === 9, state);

@@ -2,7 +2,7 @@
 //
 // One visit to the maps: look at a camera from the map, follow a link, move an item and save it, also against someone
 // else's change, and open a picture that would run a script.
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 const item = (page, name) => page.locator(".map-item").filter({ hasText: name });
 const place = (locator) => locator.evaluate(({ style }) => [style.getPropertyValue("--x"), style.getPropertyValue("--y")].map(Number));

@@ -5,7 +5,7 @@
 // Why so        What is drawn is measured on the canvas, not asked of the client: the light that runs along the lower
 //               edge of the test pattern tells the time at which a picture was made, and sound is taken where it leaves
 //               the page. LOOKHAVEN_WATCH_MS is how long each measurement takes.
-import { address, logIn, report, visit } from "./chromium.mjs";
+import { address, logIn, report, visit } from "./visit.mjs";
 
 const watchMs = Number(process.env.LOOKHAVEN_WATCH_MS ?? 6000);
 

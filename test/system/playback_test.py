@@ -4,7 +4,9 @@
 # through the web server; and a session's players give way to each other. growing_test.py has what is still being recorded.
 import base64
 import contextlib
+import hashlib
 import http.client
+import json
 import os
 import pathlib
 import re
@@ -12,6 +14,7 @@ import signal
 import subprocess
 import time
 import unittest
+import zipfile
 
 from installation import Installation, call, recorded_events, wait_until
 from painted import NumberReader
@@ -118,14 +121,14 @@ class PlaybackTest(unittest.TestCase):
         marks = {kind: self.mark(kind) for kind in ("alert", "pos")}
         links = ",".join(f"{kind}={mark['id']}" for kind, (mark, _) in marks.items())
         with Visit("events.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", MARKS=links, **span) as visit:
-            def see(step, event=self.event, is_number_told=True):
+            def see(step, event=self.event, is_number_told=True, texts=("time", "caption")):
                 seen = visit.see(step)
-                painted = self.reader.read([base64.b64decode(seen["picture"])])[0]
+                painted = seen["painted"] = self.reader.read([base64.b64decode(seen["picture"])])[0]
                 if is_number_told:
-                    self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
+                    self.assertEqual(painted, seen["told"], f"{step}: the picture is the frame that is named")
                 clock = time.strftime("%H:%M:%S", time.gmtime(event["start"] + painted // 25))
-                for text in (seen["time"], seen["caption"]):
-                    self.assertEqual(text.split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
+                for text in texts:
+                    self.assertEqual(seen[text].split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
                 return seen
 
             found = see("found")
@@ -135,6 +138,9 @@ class PlaybackTest(unittest.TestCase):
             self.assertEqual(see("two back")["told"], found["told"] - 1)
             jumped = see("jumped")
             self.assertLess(abs(jumped["told"] - found["told"] - jumped["by"] * 25), 25)
+            dragged = see("dragged", is_number_told=False, texts=["caption"])
+            self.assertLess(abs(found["told"] - dragged["painted"] - dragged["by"] * 25), 25 + 25)
+            self.assertGreater(see("let go")["told"], dragged["painted"] - 25, "it plays on from there")
             for kind, (mark, recording) in marks.items():
                 opened = see(kind, recording, is_number_told=False)
                 self.assertGreater(opened["told"], 0)
@@ -145,7 +151,12 @@ class PlaybackTest(unittest.TestCase):
             self.assertEqual(walked["address"].partition("&")[0], f"#{following['kind']}={following['id']}")
             self.assertIn(walked["notice"], opened["next"])
             self.assertGreater(walked["stills"], 1)
-            self.assertEqual(walked["complaints"], [])
+            exported = visit.see("exported")
+            with zipfile.ZipFile(f"{visit.folder}/{exported['file']}") as archive:
+                for camera in json.loads(archive.read("manifest.json"))["camera"]:
+                    for file in camera["file"]:
+                        self.assertEqual(hashlib.sha256(archive.read(file["name"])).hexdigest(), file["sha256"])
+            self.assertEqual(exported["complaints"], [])
 
     def test_a_visit_plays_video_as_it_was_recorded(self):
         h264 = self.finished(2)

@@ -5,7 +5,7 @@
 //
 // Why so        What is drawn and heard is observed where it leaves the page: decoded video is drawn as such, pictures
 //               are drawn as bitmaps.
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 /** Runs in the page, before its own scripts. */
 function observe() {
@@ -43,7 +43,7 @@ await visit(async (page, complaints) => {
       ...window.seen,
     }));
   const open = async (event) => {
-    await page.goto(`${address}#event=${event}`);
+    await page.evaluate((to) => void (location.hash = to), `#event=${event}`);
     await page.locator(`.transport a[href*="event=${event}"]`).waitFor({ timeout: 15_000 });
     await settled("playing");
   };

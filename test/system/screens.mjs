@@ -2,7 +2,7 @@
 //
 // One visit to every screen: what axe-core finds on a desk and on a phone, what the page is called, what has the focus.
 // Pictures of each are taken, at more sizes, where they are kept.
-import { address, folder, logIn, report, violations, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, violations, visit } from "./visit.mjs";
 
 const isKept = "LOOKHAVEN_KEEP_SCREENSHOTS" in process.env;
 const sizes = { desk: [1440, 900], laptop: [1024, 768], side: [844, 390], phone: [390, 844] };

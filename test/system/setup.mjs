@@ -2,7 +2,7 @@
 //
 // One visit that changes without a shell what the demo has: another camera of the network with its picture first and a
 // plan by the hour, groups, maps, settings. CAMERA is the camera's address.
-import { address, folder, logIn, report, visit } from "./chromium.mjs";
+import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 await visit(async (page, complaints) => {
   await page.goto(`${address}#settings=cameras`);

@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Goes along with a visit in Chromium, step by step.
+# Goes along with a visit in a browser, step by step.
 import contextlib
 import json
 import os
@@ -15,7 +15,7 @@ HERE = pathlib.Path(__file__).resolve().parent
 
 
 class Visit:
-    """A script of a visit in Chromium, stopped after each step that it reports. LOOKHAVEN_KEEP_SCREENSHOTS is a folder in
+    """A script of a visit, stopped after each step that it reports. LOOKHAVEN_KEEP_SCREENSHOTS is a folder in
     which its pictures stay."""
 
     def __init__(self, script, address, **environment):

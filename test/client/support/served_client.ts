@@ -2,15 +2,14 @@
 //
 // The built client in a browser, in front of a server that does what a test wants.
 
-import { existsSync } from "node:fs";
-import { chromium, type Browser, type Page } from "playwright-core";
+import { mkdtempSync, rmSync } from "node:fs";
+import { tmpdir } from "node:os";
+import { join } from "node:path";
+import type { Browser, Page } from "playwright-core";
+import { complaintsOf, launchBrowser } from "../../support/browsers.mjs";
 import { FakeServer } from "./fake_server";
 
-const executablePath = "/usr/bin/chromium";
-/** A name for this machine that a browser does not trust as it does 127.0.0.1. */
-const kUntrustedName = "--host-resolver-rules=MAP lan.test 127.0.0.1";
-
-export const hasBrowser = existsSync(executablePath);
+export { hasBrowser, isFirefox } from "../../support/browsers.mjs";
 
 /**
  * Make one in a describe block: it starts before the tests there and ends after them. After each, its pages are closed,
@@ -19,12 +18,13 @@ export const hasBrowser = existsSync(executablePath);
 export class ServedClient {
   readonly server = new FakeServer();
   address = "";
+  readonly downloads = mkdtempSync(join(tmpdir(), "client-"));
   #browser!: Browser;
-  readonly #complaints: string[] = [];
+  readonly #complaints: string[][] = [];
 
   constructor() {
     beforeAll(async () => {
-      this.#browser = await chromium.launch({ executablePath, args: ["--disable-gpu", "--disable-quic", kUntrustedName] });
+      this.#browser = await launchBrowser(this.downloads);
       this.address = await this.server.start();
       const page = await this.#browser.newPage({ viewport: { width: 64, height: 36 } });
       this.server.jpeg = this.server.archive.picture = await page.screenshot({ type: "jpeg" });
@@ -34,21 +34,19 @@ export class ServedClient {
       for (const context of this.#browser.contexts()) await context.close();
       this.server.setup.preferences.clear();
       await vi.waitFor(() => expect([...this.server.streams, ...this.server.archive.streams]).toEqual([]), 5000);
-      expect(this.#complaints.splice(0), "of scripts and of the content security policy").toEqual([]);
+      expect(this.#complaints.splice(0).flat(), "of scripts and of the content security policy").toEqual([]);
     });
     afterAll(async () => {
       await this.#browser.close();
       this.server.close();
-    });
+      rmSync(this.downloads, { recursive: true });
+    }, 60_000);
   }
 
   async open(address: string, width: number, height: number): Promise<Page> {
     const page = await this.#browser.newPage({ viewport: { width, height } });
     page.setDefaultTimeout(12_000);
-    page.on("pageerror", (error) => this.#complaints.push(String(error)));
-    page.on("console", (message) => {
-      if (message.type() === "error" && !message.text().startsWith("Failed to load resource")) this.#complaints.push(message.text());
-    });
+    this.#complaints.push(complaintsOf(page));
     await page.goto(address);
     await page.waitForSelector(".login, .screen");
     return page;

@@ -6,7 +6,7 @@ import type { Page } from "playwright-core";
 import { hasBrowser, smallControls } from "../../support/served_client";
 import { hashOf, noFocus, ServedEvents, state } from "../../support/served_events";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const events = new ServedEvents();
   const { archive, noon } = events;
 

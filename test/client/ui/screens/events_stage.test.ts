@@ -3,10 +3,10 @@
 // The events' screen in a real browser: several cameras of one moment, the playhead that is dragged, and links to what
 // is seen.
 
-import { hasBrowser } from "../../support/served_client";
+import { hasBrowser, isFirefox } from "../../support/served_client";
 import { captions, hashOf, noFocus, ServedEvents, state } from "../../support/served_events";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const events = new ServedEvents();
   const { client, archive, noon } = events;
 
@@ -32,7 +32,8 @@ describe.skipIf(!hasBrowser)("in Chromium", () => {
     await page.waitForSelector(".stage-picture[data-state=preempted] .button", { state: "attached" });
   }, 40_000);
 
-  test("cameras are added in empty cells, play in step, one large and back; a closed one ends its player", async () => {
+  // To Firefox, what playwright presses twice is no double click.
+  test.skipIf(isFirefox)("cameras are added in empty cells, play in step, one large and back; a closed one ends its player", async () => {
     client.server.cameras.push({ id: 3, name: "Gate", video_type: 1 });
     const page = await events.open(`#event=14&at=${(noon + 1260) * 1000}`, 1440, 900, 9);
     await state(page, "paused");

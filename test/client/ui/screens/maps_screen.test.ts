@@ -2,12 +2,13 @@
 //
 // The maps' screen in a real browser: no way out of its editor loses changes unasked.
 
-import { hasBrowser, ServedClient } from "../../support/served_client";
+import { hasBrowser, isFirefox, ServedClient } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
 
-  test("changes that are not saved are asked about on every way out, and stay where the user does", async () => {
+  // Of Firefox, playwright cannot read what a request sends.
+  test.skipIf(isFirefox)("changes that are not saved are asked about on every way out, and stay where the user does", async () => {
     client.server.hasSession = true;
     const place = { id: 1, hxId: 0, name: "Entrance", x: 5, y: 5, direction: 0, textPos: 0, iconCenterX: 0, iconCenterY: 0 };
     const map = { hideItemName: false, smallItemSize: false, items: [{ type: 0, ...place }] };

@@ -8,7 +8,7 @@ import { kNothingDenied } from "../../../../client/src/ui/settings/accounts/righ
 import { cameraRecord, kCode } from "../../support/fake_setup";
 import { hasBrowser, ServedClient } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
   const { setup } = client.server;
 

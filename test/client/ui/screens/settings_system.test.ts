@@ -6,7 +6,7 @@ import type { Page } from "playwright-core";
 import { cameraRecord } from "../../support/fake_setup";
 import { hasBrowser, ServedClient } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
   const { setup } = client.server;
 

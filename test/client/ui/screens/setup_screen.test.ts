@@ -5,7 +5,7 @@
 import type { Page } from "playwright-core";
 import { hasBrowser, ServedClient, smallControls } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
   const { server } = client;
 

@@ -5,7 +5,7 @@
 import { layout, openMenu, press, SavedWall, shows } from "../../support/saved_wall";
 import { hasBrowser, smallControls } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const wall = new SavedWall();
 
   test("the wall is saved, changed, overwritten, given another name and deleted; its address leads to it", async () => {

@@ -6,7 +6,7 @@ import type { Page } from "playwright-core";
 import { layout, openMenu, press, SavedWall, shows, tiles } from "../../support/saved_wall";
 import { hasBrowser } from "../../support/served_client";
 
-describe.skipIf(!hasBrowser)("in Chromium", () => {
+describe.skipIf(!hasBrowser)("in a browser", () => {
   const wall = new SavedWall();
 
   test("a sequence goes from layout to layout; a camera in both keeps its picture and its stream", async () => {

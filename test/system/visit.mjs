@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What visits in Chromium have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits
+// What visits in a browser have in common: node <visit>.mjs <address> <password> <folder for pictures>. A visit waits
 // for a line before each step and writes a line of JSON after it, so that the caller can look at the server in between.
 import { readFileSync } from "node:fs";
 import { createRequire } from "node:module";
 import { createInterface } from "node:readline";
-import { chromium } from "playwright-core";
+import { complaintsOf, launchBrowser } from "../support/browsers.mjs";
 
 export const [address, password, folder] = process.argv.slice(2);
 const lines = createInterface({ input: process.stdin })[Symbol.asyncIterator]();
@@ -26,21 +26,12 @@ export async function violations(page) {
 
 /** Gives the page, and a list that fills with what scripts and the content policy complain of. */
 export async function visit(body) {
-  const browser = await chromium.launch({
-    executablePath: "/usr/bin/chromium",
-    args: ["--disable-gpu", "--disable-quic"],
-  });
+  const browser = await launchBrowser(folder);
   try {
     await lines.next();
     const context = await browser.newContext({ ignoreHTTPSErrors: true, viewport: { width: 1280, height: 800 } });
     const page = await context.newPage();
-    const complaints = [];
-    page.on("pageerror", (error) => complaints.push(String(error)));
-    // Answers of the server are judged by what the page makes of them.
-    page.on("console", (message) => {
-      if (message.type() === "error" && !message.text().startsWith("Failed to load resource")) complaints.push(message.text());
-    });
-    await body(page, complaints);
+    await body(page, complaintsOf(page));
   } finally {
     await browser.close();
   }
