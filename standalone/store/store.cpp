@@ -87,8 +87,8 @@ void PrepareFile(const StoreAddress& address) {
     }
 }
 
-// A private, empty file, which is what SQLite fills, and nothing beside it of an attempt that was cut off. Removed unless
-// it was renamed.
+// A private, empty file, which is what SQLite fills, and nothing beside it of an attempt that was cut off. Removed
+// unless it was renamed.
 struct PartialCopy {
     explicit PartialCopy(std::string where)
         : path(std::move(where)),
