@@ -77,9 +77,10 @@ CostClass CostClassOf(const Call& call) {
         return CostClass::kSearch;
     }
     const bool reads_preferences = call.api == kUserApi.name && call.method == "Preferences";
-    const bool is_light = reads_preferences || call.api == kAuthApi.name || call.api == kPlaybackApi.name ||
-                          call.api == kRelayApi.name || call.api == kServerApi.name || call.api == kSystemApi.name ||
-                          call.api == kCameraApi.name;
+    const bool streams_footage = call.api == kEventApi.name && call.method == "Stream";
+    const bool is_light = reads_preferences || streams_footage || call.api == kAuthApi.name ||
+                          call.api == kPlaybackApi.name || call.api == kRelayApi.name || call.api == kServerApi.name ||
+                          call.api == kSystemApi.name || call.api == kCameraApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 

@@ -61,7 +61,7 @@ Footage RequireFootage(const Call& call, store::CameraAccess access) {
     return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()), access);
 }
 
-Footage FootageAskedFor(const Call& call) {
+Footage RequestedFootage(const Call& call) {
     if (!call.Parameter("event").isNull()) {
         return RequireFootage(call);
     }
@@ -98,7 +98,7 @@ int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms) {
     return std::clamp(recording.IndexAt(since_start_ms), 0, recording.FrameCount() - 1);
 }
 
-int FrameAskedFor(const Call& call, const archive::RecordingReader& recording) {
+int RequestedFrame(const Call& call, const archive::RecordingReader& recording) {
     if (call.Parameter("frame").isNull()) {
         return FrameAt(recording, call.NumberOr("time_ms", 0));
     }

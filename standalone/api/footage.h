@@ -35,7 +35,7 @@ std::optional<store::MarkKind> KindOf(const Call& call);
 Footage RequireFootage(const Call& call, store::CameraAccess access = store::CameraAccess::kPlayback);
 // To play it back: of the call's event, or else what its camera recorded last at or before time_ms. As above, and
 // throws Failure 400 where neither is given.
-Footage FootageAskedFor(const Call& call);
+Footage RequestedFootage(const Call& call);
 
 // Opens it, with all that the recorder has of it up to that time. Closes the store. Throws Failure 404 when nothing is
 // recorded yet; archive::ArchiveError, std::system_error.
@@ -45,7 +45,7 @@ archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, s
 int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms);
 
 // The index of the call's frame, or else of that at time_ms. Throws Failure 404 where the recording has no such frame.
-int FrameAskedFor(const Call& call, const archive::RecordingReader& recording);
+int RequestedFrame(const Call& call, const archive::RecordingReader& recording);
 
 // The method Frame of VEXO.Event.
 std::string TellFrame(const Call& call);

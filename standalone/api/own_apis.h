@@ -38,7 +38,7 @@ extern const OwnApi kCameraApi;    // cameras as a manager sets them up
 extern const OwnApi kCatalogApi;   // camera groups, mounts and e-maps that the caller may see
 extern const OwnApi kDeviceApi;    // doors, I/O modules and POS terminals as a manager sets them up
 extern const OwnApi kEmapApi;      // e-maps, what their editor needs, and the states of doors and ports
-extern const OwnApi kEventApi;     // report what happened at a camera, list it, download its footage
+extern const OwnApi kEventApi;     // report what happened at a camera, list it, stream and download its footage
 extern const OwnApi kGroupApi;     // camera groups as a manager sets them up
 extern const OwnApi kMountApi;     // storage mounts: how full, for how long, and their limits
 extern const OwnApi kPairingApi;   // what a paired host may ask, and one that pairs by a code

@@ -101,9 +101,9 @@ struct RecordedKeyFrame : KeyFrame {
 
 RecordedKeyFrame KeyFrameOf(const Call& call) {
     const std::int64_t time_ms = call.NumberOr("time_ms", 0);
-    const Footage footage = FootageAskedFor(call);
+    const Footage footage = RequestedFootage(call);
     const archive::RecordingReader recording = OpenFootage(call, footage, time_ms);
-    const auto [segment, entry, shown_ms] = recording.At(FrameAskedFor(call, recording));
+    const auto [segment, entry, shown_ms] = recording.At(RequestedFrame(call, recording));
     const archive::FrameEntry& key = recording.Entries(segment)[recording.KeyEntryOf(segment, entry)];
     const archive::IndexHeader& header = recording.Header(segment);
     RecordedKeyFrame frame;

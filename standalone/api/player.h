@@ -1,13 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which methods start a player of recordings, and what that player can do.
+// Which of the module's methods start a player of recordings, and what that player can do.
 #pragma once
 
 #include "standalone/api/call.h"
 
 namespace lookhaven::api {
 
-// True for the methods that start a player.
+// True for those methods.
 bool IsPlayer(const Call& call);
 
 // How many players a session may have side by side: the setting players_per_session, 1 … 16, or 9. Throws

@@ -275,7 +275,7 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
     };
     events.on_player = [&slots, &slot](std::int64_t key) {
         slots.BeginPlayer(slot, key);
-        slots.KeepOnly(slot);  // now it opens its recording
+        slots.KeepOnly(slot);  // from here on it reads what a camera sent
     };
     events.on_paired_host = [&service, &slots, &slot](const std::string& secret) {
         slot.pairing = store::PairingId(secret);

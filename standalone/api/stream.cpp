@@ -3,7 +3,7 @@
 // Why so        Pictures of H.264 are decoded and encoded again, for each viewer. What a browser can decode by itself
 //               is sent as it is: a few reads from the file, without libav. It is one of the session's players, so it
 //               is counted, replaced and stopped as those of the module are; but a client that seeks, pauses or
-//               changes the rate opens another stream, so it takes no signals but the one that says that it is to end.
+//               changes the rate opens another stream, so of the signals it takes only those that end it.
 // Invariants    (1) No part is sent more than kLead before the time of the frame before it: little is wasted when the
 //                   client seeks, and it knows in time for how long a picture stays.
 //               (2) A stream that is ended early ends without the last boundary.
@@ -29,6 +29,7 @@
 #include "standalone/binding/rights.h"
 #include "standalone/control/player_file.h"
 #include "standalone/media/recorded_media.h"
+#include "standalone/ring/stream.h"
 
 namespace lookhaven::api {
 
@@ -42,7 +43,7 @@ constexpr std::chrono::milliseconds kTailPoll{100};
 constexpr std::int64_t kMinRate = -8;
 constexpr std::int64_t kMaxRate = 4;
 
-// How many times as fast as life.
+// As a multiple of real time.
 double SpeedOf(const Call& call) {
     const std::int64_t rate = call.NumberOr("rate", 1);
     if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
@@ -79,7 +80,7 @@ void BecomePlayer(const Call& call, std::int64_t key, int max_players) {
     player.takes_rate = player.tells_position = player.can_pause = false;
     player.max_players = max_players;
     player.key = key;
-    // It interrupts what waits for a client that takes nothing.
+    // The host repeats it to interrupt a write to a client that takes nothing; SIGTERM ends the process as it stands.
     struct sigaction action {};
     action.sa_handler = [](int) {};
     ::sigaction(SIGUSR1, &action, nullptr);
@@ -110,8 +111,8 @@ class Parts {
             "--" + output_.Boundary() +
             "\r\nContent-Type: " + (is_video ? "image/" + media.VideoCodec() : "audio/" + media.AudioCodec()) +
             lines.data() + "X-Codecs: " + media.VideoCodec() + ';' + media.AudioCodec() +
-            "\r\nX-Video-Extra: " + Base64(media.VideoExtra()) + "\r\nX-Audio-Extra: " +
-            Base64(media.AudioCodec() == "AAC" ? media.AudioExtra() : std::span<const std::uint8_t>()) + "\r\n";
+            "\r\nX-Video-Extra: " + Extra(media.VideoExtra()) + "\r\nX-Audio-Extra: " +
+            Extra(media.AudioCodec() == "AAC" ? media.AudioExtra() : std::span<const std::uint8_t>()) + "\r\n";
         if (packet.number) {
             head += "X-Frame: " + std::to_string(*packet.number) + "\r\n";
         }
@@ -132,7 +133,11 @@ class Parts {
     bool End() { return Send("--" + output_.Boundary() + "--\r\n"); }
 
   private:
-    static std::string Base64(std::span<const std::uint8_t> bytes) {
+    // As in live views, too much counts as none.
+    static std::string Extra(std::span<const std::uint8_t> bytes) {
+        if (bytes.size() > ring::kMaxExtraBytes) {
+            return "";
+        }
         return base::ToBase64({reinterpret_cast<const char*>(bytes.data()), bytes.size()});
     }
     bool Send(std::string text) {
@@ -181,7 +186,7 @@ bool SendAll(const Call& call, archive::RecordingReader& recording, media::Recor
             throw NotStreamed(media.VideoCodec());
         }
         if (packet) {
-            if (!Await(call, pace.Of(before_ms)) || !parts.Add(media, *packet)) {
+            if (!Await(call, pace.Of(before_ms)) || (!packet->data.empty() && !parts.Add(media, *packet))) {
                 return false;
             }
             before_ms = packet->medium == base::Medium::kVideo ? packet->time_ms : before_ms;
@@ -195,15 +200,15 @@ bool SendAll(const Call& call, archive::RecordingReader& recording, media::Recor
     }
 }
 
-// What ask gives. Throws Failure 500 where the recording is damaged or gone.
-template <typename Ask>
-auto Readable(Ask&& ask) {
+// The result of read. Throws Failure 500 where the recording is damaged or gone.
+template <typename Read>
+auto ReadOrFail(Read&& read) {
     const auto fail = [](const std::exception& error) {
         base::LogWarning(std::string("a recording cannot be streamed: ") + error.what());
         return Failure(500, "the recording cannot be read");
     };
     try {
-        return ask();
+        return read();
     } catch (const archive::ArchiveError& error) {
         throw fail(error);
     } catch (const std::system_error& error) {
@@ -216,21 +221,21 @@ auto Readable(Ask&& ask) {
 std::string Stream(const Call& call) {
     const double speed = SpeedOf(call);
     const std::int64_t key = KeyOf(call);
-    const Footage footage = FootageAskedFor(call);
+    const Footage footage = RequestedFootage(call);
     const bool with_sound = binding::MayUse(footage.camera_id, store::CameraAccess::kAudio);
     const int max_players = PlayersPerSession(call.Records());
     archive::RecordingReader recording =
-        Readable([&] { return OpenFootage(call, footage, call.NumberOr("time_ms", 0)); });
-    const int from = FrameAskedFor(call, recording);
+        ReadOrFail([&] { return OpenFootage(call, footage, call.NumberOr("time_ms", 0)); });
+    const int from = RequestedFrame(call, recording);
     RequireStreamed(call, recording.Header(recording.At(from).segment).codec);
     BecomePlayer(call, key, max_players);
-    media::RecordedMedia media = Readable([&] { return media::RecordedMedia(recording, from, with_sound); });
+    media::RecordedMedia media = ReadOrFail([&] { return media::RecordedMedia(recording, from, with_sound); });
     call.context.NoteStream();
     Parts parts(call);
     parts.Begin();
     const Pace pace(recording.At(from).time_ms, speed);
     try {
-        if (Readable([&] { return SendAll(call, recording, media, pace, parts); })) {
+        if (ReadOrFail([&] { return SendAll(call, recording, media, pace, parts); })) {
             parts.End();
         }
     } catch (const Failure& failure) {

@@ -10,7 +10,7 @@
 namespace lookhaven::api {
 
 // Sends the stream, and returns an empty answer when it has ended. Throws Failure 400 for parameters; 404 as
-// FootageAskedFor, OpenFootage and FrameAskedFor do; 406 for footage in a codec that is not streamed, or not named by
+// RequestedFootage, OpenFootage and RequestedFrame do; 406 for footage in a codec that is not streamed, or not named by
 // the client; 500 when the footage cannot be read.
 std::string Stream(const Call& call);
 

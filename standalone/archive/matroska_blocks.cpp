@@ -16,6 +16,8 @@ namespace {
 
 // Parameter sets of a camera have some hundred bytes.
 constexpr std::size_t kMaxPrivateBytes = 65536;
+// Before the first cluster.
+constexpr int kMaxHeadElements = 1'000;
 constexpr std::uint8_t kKeyFlag = 0x80;
 constexpr std::int64_t kYear2001Ms = 978'307'200'000;
 
@@ -57,8 +59,12 @@ void MatroskaBlocks::ReadHead() {
         throw ArchiveError("no Matroska file");
     }
     position_ = segment->data;
+    int elements = 0;
     for (auto child = ebml_.ReadElement(position_, size); child && child->id != kCluster;
          child = ebml_.ReadElement(position_, size)) {
+        if (++elements > kMaxHeadElements) {
+            throw ArchiveError("a Matroska file with too much before its first frame");
+        }
         if (child->id == kInfo) {
             ReadInfo(*child);
         } else if (child->id == kTracks) {

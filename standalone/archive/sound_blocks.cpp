@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/archive/sound_blocks.h"
 
+#include <cstdlib>
 #include <optional>
 
 #include "standalone/archive/matroska_ids.h"
@@ -15,6 +16,8 @@ namespace {
 
 // Sound of some seconds; more is damage.
 constexpr std::uint64_t kMaxBetweenBytes = 1 << 22;
+// Sound lies near its time; elsewhere is damage.
+constexpr std::int64_t kMaxSkewMs = 30'000;
 // Before the data of a block: its time in the cluster, and its flags.
 constexpr std::size_t kBlockTailBytes = 3;
 
@@ -53,7 +56,7 @@ std::vector<SoundBlock> SoundBlocks::Between(const FrameEntry& frame, std::uint6
         if (element->id == kTimestamp) {
             cluster_time = static_cast<std::int64_t>(ebml_.Unsigned(*element) & UINT32_MAX);
         } else if (element->id == kSimpleBlock || element->id == kBlock) {
-            AddBlock(*element, cluster_time, found);
+            AddBlock(*element, cluster_time, frame, found);
         }
         at = element->end;
     }
@@ -68,7 +71,8 @@ std::int64_t SoundBlocks::ClusterTimeOf(const FrameEntry& frame) {
            (tail.size() < kBlockTailBytes ? 0 : RelativeTime(tail));
 }
 
-void SoundBlocks::AddBlock(const Element& block, std::int64_t cluster_time, std::vector<SoundBlock>& found) {
+void SoundBlocks::AddBlock(const Element& block, std::int64_t cluster_time, const FrameEntry& frame,
+                           std::vector<SoundBlock>& found) {
     const auto head = ebml_.Bytes(block.data, block.SizeUpTo(8 + kBlockTailBytes));
     const auto track = EbmlNumber::Parse(head, 8);
     if (!track || track->value != track_ || head.size() < track->length + kBlockTailBytes) {
@@ -80,9 +84,9 @@ void SoundBlocks::AddBlock(const Element& block, std::int64_t cluster_time, std:
     if (time < 0 || (tail[2] & kLacingFlags) != 0 || offset == block.end || block.end - offset > base::kMaxFrameBytes) {
         return;
     }
-    const std::uint64_t time_ms = static_cast<std::uint64_t>(time) * timestamp_scale_ns_ / 1'000'000;
-    if (time_ms <= kMaxFrameTimeMs) {
-        found.push_back({offset, static_cast<std::uint32_t>(block.end - offset), static_cast<std::int64_t>(time_ms)});
+    const auto time_ms = static_cast<std::int64_t>(static_cast<std::uint64_t>(time) * timestamp_scale_ns_ / 1'000'000);
+    if (std::abs(time_ms - std::int64_t{frame.time_ms}) <= kMaxSkewMs) {
+        found.push_back({offset, static_cast<std::uint32_t>(block.end - offset), time_ms});
     }
 }
 

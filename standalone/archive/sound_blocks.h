@@ -35,7 +35,8 @@ class SoundBlocks {
 
   private:
     std::int64_t ClusterTimeOf(const FrameEntry& frame);
-    void AddBlock(const EbmlReader::Element& block, std::int64_t cluster_time, std::vector<SoundBlock>& found);
+    void AddBlock(const EbmlReader::Element& block, std::int64_t cluster_time, const FrameEntry& frame,
+                  std::vector<SoundBlock>& found);
 
     EbmlReader ebml_;
     std::uint64_t timestamp_scale_ns_;

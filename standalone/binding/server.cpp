@@ -76,8 +76,8 @@ std::string SlaveHx::GetCookie() const {
     return m_Cookie;
 }
 
-// The cookie is "<timestamp>-<token>": a client that asks the server itself sends the two apart. While it is valid it
-// opens all of that server's cameras, so only managers of this host get one; other callers use the relay.
+// The cookie is "<timestamp>-<token>": a client that asks the paired host itself sends the two apart. While it is valid it
+// opens all of that host's cameras, so only managers of this host get one; other callers use the relay.
 SlaveHxMgr::SlaveHxMgr(bool load) {
     if (!load) {
         return;
@@ -97,7 +97,7 @@ SlaveHxMgr::SlaveHxMgr(bool load) {
     });
 }
 
-// This host does not monitor its servers: an enabled one is reported as online, and as of this host's version.
+// This host does not monitor its paired hosts: an enabled one is reported as online, and as of this host's version.
 std::map<int, SlaveHx> SlaveHxMgr::GetSlaveHxMap(bool onlyOnline, bool onlyEnabled, bool onlySameVersion) const {
     std::map<int, SlaveHx> servers = m_Servers;
     if (onlyOnline || onlyEnabled || onlySameVersion) {

@@ -104,7 +104,7 @@ void CopyOlderStore(const base::Installation& installation) {
     try {
         store::Store::CopyIfOlder(installation.StoreUrl(), installation.Home());
     } catch (const store::StoreError& error) {
-        base::LogError(Concat("there is no way back behind an upgrade: ", error.what()));
+        base::LogError(Concat("an upgrade could not be undone: ", error.what()));
     }
 }
 

@@ -55,8 +55,10 @@ pid_t ReadPlayerFile(std::string_view session) {
 
 void WritePlayerFile(std::string_view session) {
     const std::string path = PathOf(session);
+    errno = EACCES;  // unless opening says otherwise, it is another's
     const base::FileDescriptor file = OpenOwn(path, O_WRONLY | O_CREAT);
-    const std::string owner = std::to_string(::getpid());
+    // The line's end says where the number does, should two processes write at once.
+    const std::string owner = std::to_string(::getpid()) + '\n';
     if (!file || ::ftruncate(file.Get(), 0) != 0 || !base::WriteAll(file.Get(), owner.data(), owner.size())) {
         base::ThrowErrno("cannot write " + path);
     }

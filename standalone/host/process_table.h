@@ -28,7 +28,7 @@ namespace lookhaven::host {
 struct ProcessLimits {
     std::chrono::milliseconds answer{30'000};  // for a request that turns out not to be a stream
     std::chrono::milliseconds leave{15'000};   // from the first SIGTERM to SIGKILL
-    std::chrono::milliseconds repeat{100};     // from one SIGTERM to the next
+    std::chrono::milliseconds repeat{100};     // from one signal to the next
 };
 
 class ProcessTable {

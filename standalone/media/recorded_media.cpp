@@ -9,7 +9,8 @@ namespace lookhaven::media {
 
 RecordedMedia::RecordedMedia(const archive::RecordingReader& recording, int from, bool with_sound)
     : recording_(recording),
-      with_sound_(with_sound) {
+      with_sound_(with_sound),
+      from_(from) {
     const auto [segment, entry, time_ms] = recording.At(from);
     while (recording.At(placed_).segment < segment) {
         ++placed_;
@@ -54,7 +55,7 @@ void RecordedMedia::PlaceNew() {
     numbers_.resize(recording_.Entries(segment_).size());
     for (; placed_ < recording_.FrameCount() && recording_.At(placed_).segment == segment_; ++placed_) {
         const std::uint32_t entry = recording_.At(placed_).entry;
-        if (!numbers_[entry]) {  // else it is repeated
+        if (!numbers_[entry] || placed_ == from_) {  // else it is repeated
             numbers_[entry] = placed_;
         }
         first_placed_ = std::min(first_placed_, entry);
@@ -88,10 +89,7 @@ std::optional<RecordedPacket> RecordedMedia::Next() {
             break;
         case Place::kKnown:
         case Place::kOutside:
-            if (auto video = TakeVideo()) {
-                return video;
-            }
-            break;
+            return TakeVideo();
         }
     }
 }
@@ -114,19 +112,15 @@ std::optional<RecordedPacket> RecordedMedia::TakeSound() {
                           recording_.Header(segment_).start_wall_ms + block.time_ms, std::nullopt};
 }
 
-// Nothing for a frame that is left out.
-std::optional<RecordedPacket> RecordedMedia::TakeVideo() {
+RecordedPacket RecordedMedia::TakeVideo() {
     const std::uint32_t entry = next_++;
     const archive::FrameEntry& frame = recording_.Entries(segment_)[entry];
     previous_ = entry;
-    if (needs_key_ && !frame.key) {
-        return std::nullopt;
-    }
-    Read(frame);
-    const std::span<const std::uint8_t> data = video_.ToAnnexB(bytes_, frame.key);
-    needs_key_ = data.empty();
-    if (needs_key_) {
-        return std::nullopt;
+    std::span<const std::uint8_t> data;
+    if (frame.key || !needs_key_) {
+        Read(frame);
+        data = video_.ToAnnexB(bytes_, frame.key);
+        needs_key_ = data.empty();
     }
     return RecordedPacket{Medium::kVideo, data, base_ms_ + frame.time_ms,
                           recording_.Header(segment_).start_wall_ms + frame.time_ms, numbers_[entry]};

@@ -4,8 +4,8 @@
 // frame on with which decoding of a frame begins.
 //
 // Why so        Video goes by the index, so it has the numbers and times that players of pictures have, and goes on
-//               behind damage. What is found of sound is what lies between the frames.
-// Invariants    (1) The first video frame, and the first behind damage, is a key frame.
+//               after damage. What is found of sound is what lies between the frames.
+// Invariants    (1) The first video frame, and the first after damage, is a key frame.
 //               (2) A frame comes once it is known whether it is shown, and under which number.
 #pragma once
 
@@ -25,11 +25,12 @@ namespace lookhaven::media {
 struct RecordedPacket {
     Medium medium = Medium::kVideo;
     // Video as Annex B, with the parameter sets in front of key frames; sound as it is stored. Valid until the next
-    // call.
+    // call. Empty for a frame that is left out, since it is damaged or made from one that is.
     std::span<const std::uint8_t> data;
     std::int64_t time_ms = 0;      // from the start of the recording or span; negative before a span
     std::int64_t captured_ms = 0;  // wall clock
-    // Of a video frame, as RecordingReader counts; nothing for one outside of a span that others are made from.
+    // Of a video frame, as RecordingReader counts: of one that is repeated the first, or the one it was begun with;
+    // nothing for one outside of a span that others are made from.
     std::optional<int> number;
 };
 
@@ -59,11 +60,12 @@ class RecordedMedia {
     void PlaceNew();
     Place PlaceOf(std::uint32_t entry) const;
     std::optional<RecordedPacket> TakeSound();
-    std::optional<RecordedPacket> TakeVideo();
+    RecordedPacket TakeVideo();
     void Read(const archive::FrameEntry& block);
 
     const archive::RecordingReader& recording_;
     bool with_sound_;
+    int from_;
     int placed_ = 0;  // frames of the recording that have a place in numbers_, or belong to segments before
     // Of the segment:
     std::uint32_t segment_ = 0;
@@ -77,7 +79,7 @@ class RecordedMedia {
     std::uint32_t last_placed_ = 0;
     std::uint32_t next_ = 0;  // the entry to return next
     bool needs_key_ = true;
-    std::optional<std::uint32_t> previous_;  // entry behind which sound was not looked for
+    std::optional<std::uint32_t> previous_;  // entry after which sound was not looked for
     std::vector<archive::SoundBlock> sounds_;
     std::size_t next_sound_ = 0;
     std::vector<std::uint8_t> bytes_;

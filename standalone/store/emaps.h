@@ -18,7 +18,7 @@ enum class EmapItemType : int { kCamera = 0, kEmap = 1, kDoor = 2, kIoModule = 3
 
 struct EmapItem {
     EmapItemType type = EmapItemType::kCamera;
-    int device_id = 0;      // on the device's own server
+    int device_id = 0;      // on the device's own host
     std::string name = {};  // UTF-8, up to 255 bytes
     int server_id = 0;      // the paired host that owns the device; 0: this host
     int x = 0;              // pixels of the picture, as y

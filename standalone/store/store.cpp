@@ -87,12 +87,10 @@ void PrepareFile(const StoreAddress& address) {
     }
 }
 
-// A private, empty file, which is what SQLite fills, and nothing beside it of an attempt that was cut off. Removed
-// unless it was renamed.
-struct PartialCopy {
-    explicit PartialCopy(std::string where)
-        : path(std::move(where)),
-          file((Remove(), base::OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, 0600))) {}
+// A private, empty file for SQLite to fill; what an earlier attempt left is removed. Removed unless renamed.
+class PartialCopy {
+  public:
+    explicit PartialCopy(std::string where) : path(std::move(where)), file(OpenNew()) {}
     PartialCopy(const PartialCopy&) = delete;
     PartialCopy& operator=(const PartialCopy&) = delete;
     ~PartialCopy() { Remove(); }
@@ -105,6 +103,12 @@ struct PartialCopy {
 
     const std::string path;
     const base::FileDescriptor file;
+
+  private:
+    base::FileDescriptor OpenNew() const {
+        Remove();
+        return base::OpenFile(path, O_WRONLY | O_CREAT | O_EXCL, 0600);
+    }
 };
 
 int TakeSteps(const Connection& connection, soci::session& sql, int version) {

@@ -5,7 +5,7 @@
 // Why so        A stream of pictures of a finished recording repeats its last frame for ever; the first repeat is the
 //               end.
 
-import type { Footage } from "../wire/footage";
+import { isSameFootage, type Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { isPassing } from "./failure_reason";
@@ -35,8 +35,8 @@ async function streamedCodecs(): Promise<string> {
 export class FootageStream {
   readonly sound: RecordedSound;
   readonly #recordings: Recordings;
-  /** The camera's recordings cannot be streamed, or not be decoded here. */
-  #isRefused = false;
+  /** What cannot be streamed, or not be decoded here. */
+  #refused: Footage | null = null;
   #isVideo = false;
 
   /** `changed` is called when existence, state or error of the sound has changed. */
@@ -46,13 +46,13 @@ export class FootageStream {
   }
 
   /** Whether the stream that runs can go on at that rate, and is of the kind that is best for it. */
-  canChangeTo(rate: number): boolean {
-    return !this.#isVideo && !this.#takesVideo(rate);
+  canChangeTo(footage: Footage, rate: number): boolean {
+    return !this.#isVideo && !this.#takesVideo(footage, rate);
   }
 
   /**
    * Hands frames to `take` until that returns false or the stream ends; resolves with whether it is known to have ended
-   * behind the last frame. Rejects with a ServerError.
+   * after the last frame. Rejects with a ServerError.
    */
   async read(
     footage: Footage,
@@ -61,7 +61,7 @@ export class FootageStream {
     signal: AbortSignal,
     maxSilenceMs: number,
   ): Promise<boolean> {
-    this.#isVideo = this.#takesVideo(rate);
+    this.#isVideo = this.#takesVideo(footage, rate);
     let shown: number | null = null;
     if (this.#isVideo) {
       const keep = (frame: RecordedFrame) => {
@@ -75,7 +75,7 @@ export class FootageStream {
       } catch (error) {
         if (!(error instanceof ServerError) || isPassing(error)) throw error;
         // Any other failure will be told by the pictures, too.
-        this.#isRefused ||= error.status === kNotStreamed;
+        if (error.status === kNotStreamed) this.#refused = footage;
         this.#isVideo = false;
       }
       if (signal.aborted) return false;
@@ -97,7 +97,7 @@ export class FootageStream {
     return isWhole;
   }
 
-  #takesVideo(rate: number): boolean {
-    return !this.#isRefused && rate <= kMaxVideoRate && typeof VideoDecoder !== "undefined";
+  #takesVideo(footage: Footage, rate: number): boolean {
+    return !isSameFootage(footage, this.#refused) && rate <= kMaxVideoRate && typeof VideoDecoder !== "undefined";
   }
 }

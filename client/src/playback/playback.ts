@@ -66,7 +66,7 @@ export class Playback {
   /** Changes a running stream without interruption; rejects where that takes another playback. */
   async setRate(rate: number): Promise<void> {
     this.#rate = rate;
-    if (this.#isStreaming && !this.#streams.canChangeTo(rate)) throw new Error("another stream is needed");
+    if (this.#isStreaming && !this.#streams.canChangeTo(this.#opened.footage, rate)) throw new Error("another stream is needed");
     if (this.#key !== 0) await this.#recordings.setRate(this.#key, rate);
   }
 
@@ -86,7 +86,7 @@ export class Playback {
     }
   }
 
-  /** Resolves with whether the stream is known to have ended behind the last frame. */
+  /** Resolves with whether the stream is known to have ended after the last frame. */
   #showFrames(from: number, signal: AbortSignal): Promise<boolean> {
     const key = newStreamKey();
     const rate = this.#rate;

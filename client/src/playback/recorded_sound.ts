@@ -7,11 +7,13 @@
 
 import { AudioPlayer, type AudioPart } from "../live/audio_player";
 
-/** Faster or slower it is no sound that anybody knows. */
+/** Beyond this, sound is unintelligible. */
 const kMaxRate = 2;
 const kFeedMs = 20;
 /** What the loudspeaker's buffer holds beside one block, and what it takes until it is heard. */
 const kDelayMs = 90;
+/** Some ten seconds; the server sends two ahead. */
+const kMaxWaiting = 500;
 const kMaxBlockUs = 200_000;
 /** A picture that stays longer than this has lost its sound. */
 const kMaxPictureMs = 1_500;
@@ -19,6 +21,7 @@ const kMaxPictureMs = 1_500;
 export class RecordedSound {
   readonly player: AudioPlayer;
   #waiting: { part: AudioPart; body: Uint8Array }[] = [];
+  #run = {};
   #rate = 1;
   #blockUs = 0;
   #lastUs = 0;
@@ -30,11 +33,15 @@ export class RecordedSound {
     this.player = new AudioPlayer(changed);
   }
 
-  /** Another stream begins, at that rate. */
-  begin(rate: number): void {
+  /** Another stream begins, at that rate. Call what is returned at its end, which may come after others have begun. */
+  begin(rate: number): () => void {
     this.stop();
+    const run = (this.#run = {});
     this.#rate = rate;
     this.player.speed = Math.max(1, rate);
+    return () => {
+      if (run === this.#run) this.stop();
+    };
   }
 
   stop(): void {
@@ -48,6 +55,7 @@ export class RecordedSound {
     this.#blockUs = Math.min(Math.max(0, part.timestampUs - this.#lastUs), kMaxBlockUs);
     this.#lastUs = part.timestampUs;
     this.#waiting.push({ part, body });
+    if (this.#waiting.length > kMaxWaiting) this.#waiting.shift();
   }
 
   /** A picture of that timestamp is on the screen from now on. */

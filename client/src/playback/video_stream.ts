@@ -24,7 +24,7 @@ type Take = (frame: RecordedFrame) => Promise<boolean>;
 
 /**
  * Opens a stream of that rate and hands its frames from the index `from` on to `take` until that returns false or the
- * stream ends; resolves with whether it ended behind the last frame. Rejects with a ServerError: of status 0 when the
+ * stream ends; resolves with whether it ended after the last frame. Rejects with a ServerError: of status 0 when the
  * connection was lost, `kNotStreamed` for what has to be played as pictures from here on. Ends at once when `owner` is
  * aborted.
  */
@@ -36,7 +36,7 @@ export async function readVideo(
   owner: AbortSignal,
 ): Promise<boolean> {
   const deadline = new Deadline(kMaxSilenceMs * Math.max(1, -rate), owner);
-  sound.begin(rate);
+  const leaveSound = sound.begin(rate);
   const stream = new VideoStream(from, take, sound, deadline);
   try {
     const answer = await open(deadline.signal);
@@ -46,10 +46,11 @@ export async function readVideo(
   } catch (error) {
     if (owner.aborted) return false;
     if (error instanceof ServerError) throw error;
-    if (error instanceof MultipartError) throw new ServerError(502, 0, "The stream is damaged.");
+    if (error instanceof MultipartError) throw new ServerError(kNotStreamed, 0, "The stream is damaged.");
     throw new ServerError(0, 0, "The connection was lost.");
   } finally {
     stream.close();
+    leaveSound();
     deadline.release();
   }
 }
@@ -87,7 +88,10 @@ class VideoStream {
       if (isAtEnd) await this.#decoding.finish();
       const frame = this.#decoding.take();
       if (frame) {
+        // A frame may wait until it is due, and the server with what comes after it.
+        this.#deadline.suspend();
         if (!(await this.#show(frame, owner))) return false;
+        if (this.#isReading) this.#deadline.extend();
       } else if (isAtEnd) {
         if (this.#failure) throw this.#failure;
         return parser.hasEnded;
@@ -102,7 +106,6 @@ class VideoStream {
 
   close(): void {
     this.#decoding.close();
-    this.#sound.stop();
   }
 
   async #read(reader: ReadableStreamDefaultReader<Uint8Array>, parser: MultipartParser): Promise<void> {

@@ -11,7 +11,7 @@ export type ItemKind = (typeof kKinds)[number];
 /** What is placed on a map. Numbers are pixels of the picture and degrees clockwise from up. */
 export interface MapItem {
   kind: ItemKind;
-  /** On the server that owns the device; server 0 is this one. */
+  /** On the host that owns the device; 0 is this one. */
   id: number;
   server: number;
   name: string;

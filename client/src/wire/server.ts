@@ -268,7 +268,7 @@ export class Server {
   }
 }
 
-/** How a camera's live view is asked for: this host fetches those of paired hosts' cameras for us. */
+/** How a camera's live view is asked for: this host fetches the live views of paired hosts' cameras for us. */
 function playOf({ id, server }: StillCamera, more: Record<string, string>): [string, string, Record<string, string>] {
   const camera = String(id);
   if (server) return ["VEXO.Relay", "Play", { server: String(server), camera, ...more }];

@@ -58,6 +58,9 @@ void TakeAll(RecordedMedia& media, Taken& taken) {
             EXPECT_FALSE(packet->number);
             continue;
         }
+        if (data.empty()) {
+            continue;
+        }
         taken.video.push_back(std::move(data));
         taken.numbers.push_back(packet->number);
         taken.times_ms.push_back(packet->time_ms);
@@ -247,6 +250,12 @@ TEST(RecordedMedia, OfASpanWhatItIsMadeFrom) {
         if (is_shown) {
             EXPECT_EQ(taken.captured_ms[i], recording.CapturedMs(*taken.numbers[i]));
         }
+    }
+    const auto shown = std::ranges::count_if(taken.numbers, [](const auto& number) { return number.has_value(); });
+    ASSERT_GT(recording.FrameCount(), shown) << "a picture that stays for more than a second counts again";
+    for (int from = 0; from < recording.FrameCount(); ++from) {
+        const Taken begun = Take(mark, from);
+        EXPECT_TRUE(std::ranges::find(begun.numbers, std::optional(from)) != begun.numbers.end()) << from;
     }
 }
 

@@ -22,7 +22,7 @@ export class SequenceBar {
     this.#toggle.classList.add("sequence-toggle");
     this.#toggle.append(icon("play"));
     this.root.append(
-      iconButton("previous", "The layout before", step(-1), "P"),
+      iconButton("previous", "Previous layout", step(-1), "P"),
       this.#toggle,
       iconButton("next", "The next layout", step(1), "N"),
       element("p", { class: "sequence-text" }, this.#current, " ", this.#next),
@@ -45,7 +45,7 @@ export class SequenceBar {
     this.root.setAttribute("aria-label", `Sequence ${sequence!.name}`);
     this.root.title = `${sequence!.name}: ${sequence!.dwellS} s each`;
     this.root.classList.toggle("is-paused", isPaused);
-    label(this.#toggle, isPaused ? "Go on" : "Pause", " (Space)");
+    label(this.#toggle, isPaused ? "Resume" : "Pause", " (Space)");
     setText(this.#current, current.name);
     const place = `${layouts.findIndex(({ id }) => id === current.id) + 1} of ${layouts.length}`;
     const parts = [isPaused ? "paused" : "", place, next ? `next: ${next.name}` : ""];

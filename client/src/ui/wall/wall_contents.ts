@@ -89,9 +89,9 @@ export class WallContents {
   /** Why there is no camera on the wall. */
   get whyEmpty(): string {
     const { layout, sequence } = this.#open;
-    if (layout !== null && !this.arrangement.layout) return "There is no such layout, or no more.";
+    if (layout !== null && !this.arrangement.layout) return "This layout does not exist or was deleted.";
     if (layout !== null) return "This layout has no cameras that you may watch.";
-    if (sequence !== null && !this.run?.sequence) return "There is no such sequence, or no more.";
+    if (sequence !== null && !this.run?.sequence) return "This sequence does not exist or was deleted.";
     if (sequence !== null) return "This sequence has no layouts that can be shown.";
     return "This group has no cameras that you may watch.";
   }

@@ -100,7 +100,7 @@ export function askForSequence(host: HTMLElement, saved: SavedLayouts, sequence:
 }
 
 export function askToOverwrite(host: HTMLElement, saved: SavedLayouts, before: SavedLayout, now: SavedLayout) {
-  const sentence = `It gets what the wall shows now: ${layoutInWords(now)}. Until now: ${layoutInWords(before)}.`;
+  const sentence = `It is replaced by what the wall shows now: ${layoutInWords(now)}. Until now: ${layoutInWords(before)}.`;
   return openDialog(host, {
     title: `Overwrite ${before.name}?`,
     content: [element("p", { class: "form-hint" }, sentence)],
@@ -113,7 +113,7 @@ export function askToDelete(host: HTMLElement, saved: SavedLayouts, kind: SavedK
   const { id, name } = one;
   const losing = kind === "layout" ? saved.sequences.filter(({ layouts }) => layouts.includes(id)) : [];
   const names = losing.map((sequence) => sequence.name).join(", ");
-  const sentence = names ? `It leaves the sequences that have it: ${names}.` : `The ${kind} is gone for good.`;
+  const sentence = names ? `It is removed from the sequences that have it: ${names}.` : `The ${kind} cannot be restored.`;
   return openDialog(host, {
     title: `Delete ${name}?`,
     content: [element("p", { class: "form-hint" }, sentence)],

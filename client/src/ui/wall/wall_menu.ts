@@ -11,7 +11,7 @@ import { newId, type SavedKind, type SavedLayout, type SavedLayouts, type Sequen
 import { askForLayout, askForSequence, askToDelete, askToOverwrite } from "./wall_dialogs";
 import { layoutInWords, sequenceInWords } from "./wall_dialogs";
 
-const kUsualDwellS = 15;
+const kDefaultDwellS = 15;
 
 export interface WallMenuActions {
   /** As it is now. */
@@ -75,7 +75,7 @@ export class WallMenu {
     const open = this.#actions.open();
     const save = button("Save the wall as a layout", () => void this.#saveNew());
     save.dataset["control"] = "save";
-    const unnamed = () => ({ id: newId(), name: "", dwellS: kUsualDwellS, layouts: [] });
+    const unnamed = () => ({ id: newId(), name: "", dwellS: kDefaultDwellS, layouts: [] });
     const add = button("New sequence", () => void this.#changeSequence(unnamed()));
     add.dataset["control"] = "add";
     add.disabled = layouts.length === 0;

@@ -76,7 +76,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     expect(wall.saved).toEqual({ "wall.layout": "2" });
     await page.keyboard.press("Escape");
     await page.goBack();
-    await page.getByText("There is no such layout, or no more.").waitFor();
+    await page.getByText("This layout does not exist or was deleted.").waitFor();
     await page.getByRole("link", { name: "Show all cameras" }).click();
     await shows(page, "1234");
   }, 60_000);

@@ -57,7 +57,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
 
     await press(bar, "Pause");
     expect(await text()).toBe("Yard paused · 1 of 2 · next: Gates");
-    await press(bar, "Go on");
+    await press(bar, "Resume");
     await press(bar, "The next layout");
     await shows(page, "12");
     await bar.getByRole("link", { name: "Leave the sequence, stay at Gates" }).click();
