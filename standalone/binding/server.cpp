@@ -76,8 +76,8 @@ std::string SlaveHx::GetCookie() const {
     return m_Cookie;
 }
 
-// The cookie is "<timestamp>-<token>": a client that asks the paired host itself sends the two apart. While it is valid it
-// opens all of that host's cameras, so only managers of this host get one; other callers use the relay.
+// The cookie is "<timestamp>-<token>": a client that asks the paired host itself sends the two apart. While it is valid
+// it opens all of that host's cameras, so only managers of this host get one; other callers use the relay.
 SlaveHxMgr::SlaveHxMgr(bool load) {
     if (!load) {
         return;
