@@ -24,6 +24,8 @@ export interface OverviewActions extends Omit<TimelineActions, "stillAddress"> {
   /** Other cameras or kinds of events were chosen. */
   filtered(): void;
   dayPicked(): void;
+  /** More is known of what was recorded. */
+  learned(): void;
 }
 
 export class Overview {
@@ -41,7 +43,10 @@ export class Overview {
 
   constructor(recordings: Recordings, preferences: Preferences, actions: OverviewActions) {
     this.#actions = actions;
-    this.cache = new FootageCache(recordings, () => this.#showFootage());
+    this.cache = new FootageCache(recordings, () => {
+      this.#showFootage();
+      actions.learned();
+    });
     this.#days = new RecordedDays(recordings, () => this.#showDays());
     const scope = () => ({ cameras: this.#chosen, kinds: this.filter.kinds });
     this.#search = new TextSearch(recordings, scope, () => this.#showFootage());

@@ -11,6 +11,7 @@ export class Scrubbing {
   readonly #playback: SyncPlayback;
   readonly #stage: Stage;
   readonly #stills: ScrubStills;
+  #atMs: number | null = null;
 
   constructor(recordings: Recordings, playback: SyncPlayback, stage: Stage) {
     this.#playback = playback;
@@ -19,7 +20,15 @@ export class Scrubbing {
   }
 
   to(atMs: number): void {
+    this.#atMs = atMs;
     this.#playback.scrub(atMs);
+    this.refresh();
+  }
+
+  /** Call it when more is known of what was recorded: where the playhead rests, there may be a picture after all. */
+  refresh(): void {
+    const atMs = this.#atMs;
+    if (atMs === null) return;
     this.#stills.request(this.#stage.stillsAt(atMs, (camera) => this.#playback.footageAt(camera, atMs)));
   }
 
@@ -30,6 +39,7 @@ export class Scrubbing {
   }
 
   close(): void {
+    this.#atMs = null;
     this.#stills.stop();
     this.#stage.showPlayers();
   }

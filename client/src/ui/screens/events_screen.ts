@@ -57,6 +57,7 @@ export class EventsScreen extends Screen {
     choose: (span) => this.#export.setSpan(span),
     filtered: () => this.#showLanes(),
     dayPicked: () => this.#layout.choose("list"),
+    learned: () => this.#scrubbing.refresh(),
   });
   readonly #playback = new SyncPlayback(
     this.#recordings,

@@ -33,7 +33,8 @@ export interface RecordFormParts<Settings extends object, Stored extends Revised
   /** Stores `settings`, made from `base`; null: the user has changed their mind. Rejects with a ServerError. */
   save(settings: Settings, base: Stored | null): Promise<Stored | null>;
   describe: Descriptions<Settings>;
-  onSaved(stored: Stored): void;
+  /** `hadSecrets`: fields that are never shown held something when it was saved. */
+  onSaved(stored: Stored, hadSecrets: boolean): void;
   /** "camera" */
   noun: string;
   submit: string;
@@ -102,6 +103,7 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
     const problem = this.#fields.problem(settings) || (invalid ? "Please check the marked field." : "");
     this.#message.textContent = problem;
     if (problem) return void (invalid as HTMLElement | undefined)?.focus();
+    const { hasSecrets } = this.#fields;
     this.#submit.setAttribute("aria-busy", "true");
     try {
       const stored = await this.#parts.save(settings, this.#base);
@@ -110,7 +112,7 @@ export class RecordForm<Settings extends object, Stored extends Revised> {
       this.#take(stored);
       // The server may have been slow.
       if (!isSame(typed, settings)) this.#fields.value = merged(settings, typed, this.#initial);
-      this.#parts.onSaved(stored);
+      this.#parts.onSaved(stored, hasSecrets);
     } catch (error) {
       const { status, data, message } = asServerError(error);
       if (status === 409 && this.#base && isStored<Stored>(data)) this.#showConflict(data);

@@ -105,7 +105,7 @@ export abstract class RecordPage<
         settingsOf,
         save: (settings, base) => this.save(settings, base, fields),
         describe: this.descriptions(list),
-        onSaved: (stored) => this.#onSaved(stored, fields),
+        onSaved: (stored, hadSecrets) => this.#onSaved(stored, hadSecrets ? fields : null),
         noun,
         submit: record ? "Save" : `Add the ${noun}`,
         leave: this.context.leave,
@@ -118,10 +118,11 @@ export abstract class RecordPage<
     this.show(...this.above(record), this.#form.root, ...this.below(record));
   }
 
-  #onSaved(stored: Stored, fields: Fields): void {
+  /** `saved` are fields whose secrets are stored. */
+  #onSaved(stored: Stored, saved: Fields | null): void {
     const isNew = this.#record === null;
     this.#record = stored;
-    fields.clearSecrets();
+    saved?.clearSecrets();
     this.title = stored.name;
     notify(isNew ? `${stored.name} is added.` : `The ${this.#kind.noun} is saved.`);
     if (isNew) this.context.done();

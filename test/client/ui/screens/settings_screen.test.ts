@@ -246,12 +246,16 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await page.getByLabel("Entrance: Playback").click();
     expect(await page.getByLabel("Entrance: Export").getAttribute("title")).toBe("");
     await page.getByLabel("Entrance: Export").click();
+    let answer = () => {};
+    const isTyped = new Promise<void>((resolve) => (answer = resolve));
+    await page.route(/VEXO\.User.*method=Set/, (route) => void isTyped.then(() => route.continue()), { times: 1 });
     await save(page);
-    const deny = { ...kNothingDenied, audio: [2], export: [1], group: { ...kNothingDenied.group, live: [1] } };
-    await vi.waitFor(() => expect(setup.asked).toEqual([["user", { id: 2, revision: 1, deny }]]));
     await page.getByLabel("New password").fill("long enough");
     await page.getByLabel("Repeat password").fill("long enough");
     await save(page);
+    answer();
+    const deny = { ...kNothingDenied, audio: [2], export: [1], group: { ...kNothingDenied.group, live: [1] } };
+    await vi.waitFor(() => expect(setup.asked).toEqual([["user", { id: 2, revision: 1, deny }]]));
     const dialog = page.getByRole("dialog", { name: "Change guard" });
     for (const word of ["wrong", "right"]) {
       await dialog.getByLabel("Your own password").fill(word);
