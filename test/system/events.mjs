@@ -41,17 +41,20 @@ await visit(async (page, complaints) => {
     return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time.slice(0, 8)}`) / 1000 + Number(time.slice(8));
   };
   // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, pan it to
-  // the middle, for near an edge the timeline follows what plays, go on towards the seconds, and look again.
+  // the middle, for near an edge the timeline follows what plays, go on towards the seconds, and look again, until it is
+  // there: a browser may take a wheel for turned before the page has seen it.
   const x = box.width / 2;
   let scale;
+  let offS;
   const aim = async () => {
     const [here, before] = [await timeAt(x), await timeAt(x - 400)];
     scale = (here - before) / 400;
+    offS = Math.abs(middle - here);
     await page.mouse.move(box.x + x, y);
     await page.mouse.wheel(Math.round((middle - here) / scale), 0);
   };
-  for (await aim(); scale > 0.2; await aim()) {
-    for (let step = 0; step < 8; step += 1) await page.mouse.wheel(0, -240);
+  for (await aim(); scale > 0.2 || offS > 1; await aim()) {
+    for (let step = 0; scale > 0.2 && step < 8; step += 1) await page.mouse.wheel(0, -240);
   }
   await timeAt(x);
   await page.keyboard.press(" ");
