@@ -92,13 +92,15 @@ std::uint64_t PinnedRead::LastCount(int last_sequence) const {
 
 void ReleaseProcessPins(void* ring, const Entry* only_entry) {
     const std::lock_guard lock(process_pins_mutex);
+    bool is_done = false;
     std::erase_if(process_pins, [&](const ProcessPin& pin) {
-        if (pin.ring != ring || (only_entry != nullptr && pin.entry != only_entry)) {
+        if (is_done || pin.ring != ring || (only_entry != nullptr && pin.entry != only_entry)) {
             return false;
         }
         // The pin may be of another ring, attached earlier at the same address.
         if (pin.generation == View(ring).Constants().generation) {
             ReaderTable(View(ring)).Release(pin.reader);
+            is_done = only_entry != nullptr;  // another read of the entry keeps its own pin
         }
         return true;
     });

@@ -61,7 +61,7 @@ class PinnedRead {
     bool handed_over_ = false;
 };
 
-// Releases the process pin of the entry, or with null all that this process has in the ring.
+// Releases one process pin of the entry, or with null all that this process has in the ring.
 void ReleaseProcessPins(void* ring, const Entry* only_entry);
 
 // Forgets the process pins of an earlier attachment at that address, without touching the ring that is there now.

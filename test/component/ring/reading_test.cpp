@@ -100,6 +100,8 @@ TEST_F(ReadingTest, EntriesWithoutAPositionAreHeldUntilTheyAreReleasedAndTakeNoS
     WriteGroup("KppKp");
     const Entry* newest = ReadLatest(ring_);
     const Entry* key = ReadLatestIFrame(ring_);
+    EXPECT_EQ(ReadLatest(ring_), newest);
+    ReadFinish(ring_, newest, nullptr);  // one of two reads
     EXPECT_EQ(CountOf(newest), 5U);
     EXPECT_EQ(CountOf(key), 4U);
     EXPECT_EQ(key->flags, kKeyFrame);
