@@ -6,7 +6,7 @@ import json
 import subprocess
 import unittest
 
-from cameras_test import JPEG, VIDEO, Camera
+from cameras_test import JPEG, PICTURE, VIDEO, Camera
 from installation import BUILD, Installation, call, program, wait_until
 
 RTSP_CAMERA = BUILD / "bin/rtsp-camera"
@@ -26,7 +26,7 @@ class CameraSetupTest(unittest.TestCase):
         return answer["data"] if answer["success"] else answer["error"]
 
     def test_a_camera_is_looked_at_added_and_on_the_wall(self):
-        camera = Camera(VIDEO)
+        camera = Camera(VIDEO, repeated=PICTURE)
         address = f"http://127.0.0.1:{camera.port}/video"
         found = self.ask("Probe", address=address, account="root", password="camera-s3cret")
         self.assertEqual((found["codec"], found["width"], found["audio"]), ("mjpeg", 64, False))

@@ -7,37 +7,41 @@ import ssl
 import subprocess
 import tempfile
 import threading
+import time
 import unittest
 
 from installation import BUILD
 
 JPEG = bytes.fromhex("ffd8ffc0000b080030004001011100ffd9")
-VIDEO = (
-    b"HTTP/1.1 200 OK\r\nContent-Type: multipart/x-mixed-replace; boundary=edge\r\n\r\n"
-    + b"--edge\r\nContent-Type: image/jpeg\r\nContent-Length: %d\r\n\r\n%b\r\n" % (len(JPEG), JPEG) * 30
-)
+PICTURE = b"--edge\r\nContent-Type: image/jpeg\r\nContent-Length: %d\r\n\r\n%b\r\n" % (len(JPEG), JPEG)
+VIDEO = b"HTTP/1.1 200 OK\r\nContent-Type: multipart/x-mixed-replace; boundary=edge\r\n\r\n" + PICTURE * 30
 
 
 class Camera:
-    """Gives whoever connects the same answer to every request."""
+    """Gives whoever connects the same answer to every request; with `repeated` it goes on with that until they leave."""
 
-    def __init__(self, answer, tls=None):
-        self.answer, self.tls, self.requests = answer, tls, 0
+    def __init__(self, answer, tls=None, repeated=b""):
+        self.answer, self.tls, self.repeated, self.requests = answer, tls, repeated, 0
         self.listener = socket.create_server(("127.0.0.1", 0))
         self.port = self.listener.getsockname()[1]
         threading.Thread(target=self.serve, daemon=True).start()
 
     def serve(self):
         while True:
-            connection = self.listener.accept()[0]
-            try:
-                connection.settimeout(5)
-                connection = self.tls.wrap_socket(connection, server_side=True) if self.tls else connection
-                self.requests += bool(connection.recv(65536))
-                connection.sendall(self.answer)
-            except OSError:
-                pass  # refused by the reader
-            connection.close()
+            threading.Thread(target=self.send, args=[self.listener.accept()[0]], daemon=True).start()
+
+    def send(self, connection):
+        try:
+            connection.settimeout(5)
+            connection = self.tls.wrap_socket(connection, server_side=True) if self.tls else connection
+            self.requests += bool(connection.recv(65536))
+            connection.sendall(self.answer)
+            while self.repeated:
+                time.sleep(0.1)
+                connection.sendall(self.repeated)
+        except OSError:
+            pass  # refused by the reader
+        connection.close()
 
 
 def moved(protocol, address):
