@@ -44,10 +44,10 @@ if(LOOKHAVEN_TESTS AND LOOKHAVEN_SANITIZE)
 endif()
 
 # lookhaven_test(<name> <label> SOURCES <source>... LIBRARIES <library>... [TIMEOUT <seconds>] [ALONE] [BY_SUITE]
-# [LONG]): a GoogleTest program. ctest runs each case as "<name>.<suite>.<case>" in a process of its own, under the given
-# label (unit, component, system). Those of one program run one after the other, for they may share segments and files of
-# the machine. ALONE: not beside any others, for it looks at times. BY_SUITE: one process per suite, for cases that share
-# an expensive set-up. LONG: begun first, so that the others run beside it.
+# [LONG]): a GoogleTest program. ctest runs each case as "<name>.<suite>.<case>" in a process of its own, under the
+# given label (unit, component, system). Those of one program run one after the other, for they may share segments and
+# files of the machine. ALONE: not beside any others, for it looks at times. BY_SUITE: one process per suite, for
+# cases that share an expensive set-up. LONG: begun first, so that the others run beside it.
 function(lookhaven_test name label)
     cmake_parse_arguments(arg "ALONE;BY_SUITE;LONG" "TIMEOUT" "SOURCES;LIBRARIES" ${ARGN})
     add_executable(${name} ${arg_SOURCES})
