@@ -58,15 +58,24 @@ bool IsPicture(Unit unit) {
     return unit == Unit::kPicture || unit == Unit::kKeyPicture;
 }
 
+// The frame's first slice; kOther when it has none.
+Unit FirstSlice(Codec codec, std::span<const std::uint8_t> frame) {
+    for (std::size_t at = AfterStartCode(frame, 0); at < frame.size(); at = AfterStartCode(frame, at)) {
+        if (const Unit unit = UnitAt(codec, frame[at]); IsPicture(unit)) {
+            return unit;
+        }
+    }
+    return Unit::kOther;
+}
+
 }  // namespace
 
 bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame) {
-    for (std::size_t at = AfterStartCode(frame, 0); at < frame.size(); at = AfterStartCode(frame, at)) {
-        if (const Unit unit = UnitAt(codec, frame[at]); IsPicture(unit)) {
-            return unit == Unit::kKeyPicture;
-        }
-    }
-    return false;
+    return FirstSlice(codec, frame) == Unit::kKeyPicture;
+}
+
+bool HasPicture(Codec codec, std::span<const std::uint8_t> frame) {
+    return IsPicture(FirstSlice(codec, frame));
 }
 
 bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece) {

@@ -17,6 +17,9 @@ namespace lookhaven::media {
 // Whether the frame can be decoded without any other.
 bool IsKeyFrame(Codec codec, std::span<const std::uint8_t> frame);
 
+// Whether a slice is among the frame's units, which may else be parameter sets and messages alone.
+bool HasPicture(Codec codec, std::span<const std::uint8_t> frame);
+
 // Whether a piece of the stream may begin a picture: it begins with a first slice, or with a unit that precedes one.
 bool MayBeginPicture(Codec codec, std::span<const std::uint8_t> piece);
 

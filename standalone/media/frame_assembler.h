@@ -3,8 +3,9 @@
 // Assembles the frames of an Annex B stream from the pieces that RTP delivers.
 //
 // Why so        libav's parser splits a picture where a camera repeats its parameter sets between the slices, and the
-//               time alone may jump inside a picture when the camera corrects its clock. So a new picture begins only
-//               where both the time and the bytes say so.
+//               time alone may jump inside a picture when the camera corrects its clock, between its parameter sets
+//               and its first slice, too. So a new picture begins only where both the time and the bytes say so, and
+//               the previous one has a slice.
 #pragma once
 
 #include <cstdint>
@@ -33,6 +34,7 @@ class FrameAssembler {
   private:
     Codec codec_;
     std::vector<std::uint8_t> pending_;
+    bool has_picture_ = false;  // in pending_
     std::vector<std::uint8_t> whole_;
     std::int64_t pending_time_us_ = 0;
 };

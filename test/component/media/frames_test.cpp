@@ -60,8 +60,10 @@ TEST(FrameAssembler, PutsPiecesTogether) {
         std::string piece;
         std::int64_t time_us;
         std::string whole;
+        std::int64_t whole_time_us = 0;  // 0: of its first piece
     };
     const Row rows[] = {
+        {"rest of a picture", "\x9a\x41\xff", 60, ""},
         {"sets", sets, 100, ""},
         {"first slice", idr, 100, ""},
         {"sets again between the slices", sets, 100, ""},
@@ -73,12 +75,17 @@ TEST(FrameAssembler, PutsPiecesTogether) {
         {"next picture", picture, 180, picture + rest + picture_2 + picture},
         {"too large", std::string(base::kMaxFrameBytes, 'x'), 180, ""},
         {"next picture", idr, 220, ""},
-        {"next picture", idr, 260, idr},
+        {"sets of the next picture", sets, 260, idr},
+        {"its slice, clock corrected", idr, 265, ""},
+        {"next picture", picture, 300, sets + idr, 265},
     };
     FrameAssembler assembler(Codec::kH264);
     for (const Row& row : rows) {
         const auto frame = assembler.Add(Bytes(row.piece), row.time_us);
         EXPECT_TRUE((frame ? Text(frame->data) : "") == row.whole) << row.name;
+        if (row.whole_time_us != 0) {
+            EXPECT_EQ(frame ? frame->time_us : 0, row.whole_time_us) << row.name;
+        }
     }
 }
 
