@@ -43,7 +43,11 @@ extern "C" __attribute__((visibility("default"))) int getaddrinfo(const char* na
     using namespace lookhaven::camera;
     static const auto real = reinterpret_cast<decltype(&getaddrinfo)>(::dlsym(RTLD_NEXT, "getaddrinfo"));
     if (name == nullptr || ::strcasecmp(name, permitted_host.c_str()) != 0) {
-        refused_host = name == nullptr ? "" : name;
+        // A number alone is the address that a session description names, which TCP has no use for: no redirect.
+        const bool only_number = hints != nullptr && (hints->ai_flags & AI_NUMERICHOST) != 0;
+        if (name != nullptr && !only_number) {
+            refused_host = name;
+        }
         return EAI_FAIL;
     }
     if (look_ups_left-- <= 0) {
