@@ -4,6 +4,7 @@
 import json
 import os
 import pathlib
+import re
 import signal
 import socket
 import subprocess
@@ -152,9 +153,12 @@ class Stand(Installation):
             "@tls_port@": tls_port,
             "@listen_v6@": "",
             "@prefer_chacha20@": "off",
+            "@trusted_proxies@": "",
             "@strict_transport_security@": "",
         }.items():
             configuration = configuration.replace(word, str(value))
+        unfilled = re.search(r"@\w+@", configuration)
+        assert not unfilled, f"the configuration of nginx has {unfilled[0]}, which nothing fills in"
         path = folder / "nginx.conf"
         path.write_text(configuration)
         self._start(name, "/usr/sbin/nginx", "-p", folder, "-c", path)
