@@ -140,7 +140,10 @@ TEST_P(StoreTest, CheckNamesACameraWithoutALiveSource) {
     EXPECT_THAT(store_.Check(), ElementsAre(HasSubstr("camera 1")));
 }
 
-TEST_P(StoreTest, WritersOnSeveralConnectionsLoseNothing) {
+class ConcurrentWriters : public StoreTest {};
+LOOKHAVEN_ON_BOTH_ENGINES(ConcurrentWriters);
+
+TEST_P(ConcurrentWriters, LoseNothing) {
     const std::int64_t before = Settings(store_).Revision();
     InParallel(4, [](Store& store) {
         for (int i = 0; i < 25; ++i) {
