@@ -249,12 +249,19 @@ export class WallScreen extends Screen {
   }
 
   #refresh(): void {
-    const lost = this.#grid.refresh();
+    this.#grid.refresh();
     this.#overlay.refresh();
-    const cameras = this.#contents.shown.length;
-    const counted = `${cameras} ${cameras === 1 ? "camera" : "cameras"}${lost > 0 ? ` · ${lost} without signal` : ""}`;
-    setText(this.#status, this.#contents.cameras === null ? "" : this.#error || counted);
-    this.#status.classList.toggle("alarm", this.#error !== "" || lost > 0);
+    const { cameras, shown } = this.#contents;
+    const lost = (cameras ?? []).filter((camera) => this.#isLost(camera));
+    setText(this.#status, cameras === null ? "" : this.#error || countText(shown.length, cameras.length, lost.length));
+    this.#status.title = lost.length > 0 ? `Without signal: ${lost.map(({ name }) => name).join(", ")}` : "";
+    this.#status.classList.toggle("alarm", this.#error !== "" || lost.length > 0);
+  }
+
+  /** As its tile knows it; where that does not look, because nobody sees it, as the recorder does. */
+  #isLost(camera: Camera): boolean {
+    const state = this.#grid.tile(camera.id)?.picture.state() ?? { kind: "idle" };
+    return state.kind === "lost" || (state.kind === "idle" && this.server.signalLosses.of(camera) !== null);
   }
 
   #step(by: 1 | -1): void {
@@ -264,6 +271,12 @@ export class WallScreen extends Screen {
     const next = cameras[(at + by + cameras.length) % cameras.length];
     if (next) showCamera(next.id);
   }
+}
+
+/** Of all that the account may see, those without signal; a group or a layout shows some of them. */
+function countText(shown: number, all: number, lost: number): string {
+  const cameras = `${shown === all ? "" : `${shown} of `}${all} ${all === 1 ? "camera" : "cameras"}`;
+  return lost > 0 ? `${cameras} · ${lost} without signal` : cameras;
 }
 
 function settingsLink({ isManager }: CameraList, text: string): HTMLElement[] {

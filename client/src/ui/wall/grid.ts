@@ -115,17 +115,12 @@ export class Grid {
     return [...this.#tiles.values()].find((tile) => tile.root === root);
   }
 
-  /** How many of the tiles on the screen have lost their signal. Also brings all tiles up to date with the clock. */
-  refresh(): number {
-    let lost = 0;
+  /** Brings all tiles up to date with the clock. */
+  refresh(): void {
     const unplayable = this.#inOrder().flatMap((tile) => (tile.unplayable ? tile.camera.id : []));
     if (unplayable.join() !== this.#unplayable) this.#assignSoon();
     this.#unplayable = unplayable.join();
-    for (const tile of this.#tiles.values()) {
-      tile.picture.refresh();
-      if (tile.picture.state().kind === "lost") lost += 1;
-    }
-    return lost;
+    for (const tile of this.#tiles.values()) tile.picture.refresh();
   }
 
   /** Closes all streams; do not use the grid after that. */

@@ -158,7 +158,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
       expect(cut, "cut off").toBe(false);
       const hidden = await page.locator(".wall .bar-status").evaluate((status) => {
         const before = status.textContent;
-        status.textContent = "16 cameras · 12 without signal";
+        status.textContent = "16 of 64 cameras · 12 without signal";
         const hiddenPx = status.scrollHeight - status.clientHeight;
         status.textContent = before;
         return hiddenPx;

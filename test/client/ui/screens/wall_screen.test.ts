@@ -161,7 +161,12 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     const tiles = () => page.locator(".tile").evaluateAll((all) => all.map((tile) => (tile as HTMLElement).dataset["camera"]));
     await page.getByRole("link", { name: "Yard" }).click();
     await open(["1/1", "2/1"]);
-    expect([await tiles(), await page.textContent(".bar-status")]).toEqual([["1", "2"], "2 cameras"]);
+    expect([await tiles(), await page.textContent(".bar-status")]).toEqual([["1", "2"], "2 of 4 cameras"]);
+    const lost = { state: "no-signal", no_signal: { since: 0, cause: "refused" } };
+    server.answers = { CameraStates: { recorder: true, camera: [1, 4, 9].map((id) => ({ id, ...lost })) } };
+    // Of these, camera 1 has its picture again, and camera 9 is none of the account's.
+    await page.locator(".bar-status[title$=': Camera <b>4</b>']", { hasText: /^2 of 4 cameras · 1 without signal$/ }).waitFor();
+    server.answers = {};
     await page.focus("[data-camera='1'] .tile-open");
     await page.keyboard.press("Shift+ArrowRight");
     await page.click("[data-camera='1'] .tile-open");
