@@ -1,14 +1,14 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # Visits: log in, see camera 1 move, take a snapshot, log out; see and hear camera 2, hide the tab; nine
-# cameras of one moment. And what the server then still runs.
+# cameras of one moment; alerts in two tabs. And what the server then still runs.
 import base64
 import json
 import subprocess
 import time
 import unittest
 
-from installation import Installation, recorded_events, wait_until
+from installation import Installation, call, recorded_events, wait_until
 from painted import ClockReader
 from players import numbered, playing
 from visit import Visit
@@ -87,6 +87,27 @@ class BrowserTest(unittest.TestCase):
             closed = visit.see("closed")
             wait_until(lambda: len(self.server.requests() - self.idle) == 8 + WATCH, 2, "the closed one's player ends")
             self.assertEqual(closed["violations"] + closed["complaints"], [])
+
+    def test_what_is_new_is_the_same_after_a_reload_and_in_every_tab(self):
+        def mark(text):
+            answer = self.server.request(call("VEXO.Event", "Mark"), "admin", form={"kind": "alert", "camera": 1, "text": text})
+            self.assertEqual(answer.status, 200)
+
+        wait_until(lambda: recorded_events(self.server, 1), 30, "footage, before which nothing can have happened")
+        with Visit("alerts.mjs", self.secure) as visit:
+            visit.see("watching")
+            mark("First")
+            mark("Second")
+            visit.see("told")
+            visit.see("away")
+            mark("Third")
+            visit.see("back")
+            self.assertEqual(visit.see("looked")["notice"], "3 new since you looked.")
+            mark("Fourth")
+            visit.see("alone")
+            mark("Fifth")
+            seen = visit.see("looking")
+            self.assertEqual((seen["notice"], seen["complaints"]), ("1 new since you looked.", []))
 
     def test_a_visit_over_https_and_http(self):
         for address, protocol in (self.secure, "h2"), (f"http://127.0.0.1:{self.server.port}/", "http/1.1"):

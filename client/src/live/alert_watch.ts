@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps the stream of what is being reported open, and goes on where it was after each loss of the connection.
+// Keeps the stream of what is being reported open: from where the user last looked on, and after each loss of the
+// connection from where it was.
 //
 // Why so        Over HTTP/1.1 a stream would hold one of the browser's six connections for good. There it is opened
 //               every few seconds instead, and closed when it has told what was missed.
@@ -9,9 +10,10 @@ import { Deadline } from "../wire/deadline";
 import { delay } from "../wire/delay";
 import { EventStreamParser, type StreamEvent } from "../wire/event_stream";
 import type { RawMark } from "../wire/footage";
-import type { Server } from "../wire/server";
+import { asServerError, type Server } from "../wire/server";
 import { Backoff } from "./backoff";
 
+const kBadRequest = 400;
 /** Longer than two of the server's events apart: each 15 seconds, it tells at least that it is alive. */
 const kMaxSilenceMs = 40_000;
 const kPauseMs = 5_000;
@@ -26,25 +28,28 @@ export async function watchAlerts(
   signal: AbortSignal,
 ): Promise<void> {
   const backoff = new Backoff();
-  let place = "";
+  let place = server.alerts.start;
   while (!signal.aborted) {
     let isTold = false;
     const deadline = new Deadline(kMaxSilenceMs, signal);
     let missed = 0;
     let nowS = 0;
     const take = ({ name, id, data }: StreamEvent) => {
+      place = server.alerts.place = id;
       if (name === "start") {
         const start = JSON.parse(data) as { missed: number; resumed: boolean; time: number };
-        if (place && !start.resumed) server.alerts.noteGap();
+        if (!start.resumed) server.alerts.beginAt(id);
         [missed, nowS] = [start.missed, start.time - performance.now() / 1000];
       } else if (name === "mark") {
         const mark = JSON.parse(data) as RawMark;
         missed -= 1;
         if (admits(mark.kind)) server.alerts.note(mark, mark.time > nowS + performance.now() / 1000 - kMaxNewsAgeS);
       }
-      place = id;
       backoff.reset();
-      isTold = isBrief && missed <= 0;
+      // Of what was missed, less may be told than was announced: what was denied meanwhile is not.
+      const isAll = missed <= 0 || (name !== "start" && name !== "mark");
+      if (isAll) server.alerts.catchUp();
+      isTold = isBrief && isAll;
     };
     try {
       const answer = await server.media("VEXO.Event", "Watch", place ? { after: place } : {}, deadline);
@@ -55,8 +60,9 @@ export async function watchAlerts(
         parser.push(read.value);
         if (isTold) break;
       }
-    } catch {
-      // The next attempt goes on where this one was.
+    } catch (error) {
+      // The next attempt goes on where this one was, unless that is no place of this server.
+      if (asServerError(error).status === kBadRequest) place = "";
     } finally {
       deadline.release();
     }

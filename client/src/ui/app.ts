@@ -6,6 +6,7 @@
 import { watchAlerts } from "../live/alert_watch";
 import { streamLimit } from "../live/stream_budget";
 import type { EventKind } from "../playback/coverage";
+import { LastLookStore } from "../wire/last_look";
 import { Preferences } from "../wire/preferences";
 import { protocol } from "../wire/protocol";
 import { Server, type Account } from "../wire/server";
@@ -123,13 +124,11 @@ export class App {
     this.#account = account;
     this.#preferences?.close();
     this.#preferences = preferences;
-    if (this.#remembered.userId !== account.user_id) {
-      this.#remembered = rememberedFor(account.user_id);
-      this.#server.alerts.forget();
-    }
+    if (this.#remembered.userId !== account.user_id) this.#remembered = rememberedFor(account.user_id);
     this.#watching?.abort();
     this.#watching = new AbortController();
     const { signal } = this.#watching;
+    this.#server.alerts.begin(new LastLookStore(account.user_id), signal);
     const admits = (kind: EventKind) => isKindChosen(preferences, kind);
     void watchAlerts(this.#server, streamLimit(protocol()) < Infinity, admits, signal);
     new AlertNotifications(account.user_id).follow(this.#server.alerts, cameraNames(this.#server), signal);

@@ -8,12 +8,20 @@ import { newsText } from "./news_text";
 
 /** Until `closed` is aborted. */
 export function tellNewEvents(alerts: Alerts, closed: AbortSignal): void {
-  const look = () => (document.hidden ? "" : newsText(alerts.look()));
-  const tell = () => {
-    const text = look();
-    if (text) notify(`${text}.`);
+  let isTold = false;
+  const look = () => {
+    if (document.hidden || !alerts.isCaughtUp) return;
+    const isFirst = !isTold;
+    // Before the look, which changes the news.
+    isTold = true;
+    const text = newsText(alerts.look());
+    if (text && isFirst) notify(`${text}.`);
   };
-  document.addEventListener("visibilitychange", tell, { signal: closed });
-  tell();
+  const follow = () => {
+    isTold &&= !document.hidden;
+    look();
+  };
+  document.addEventListener("visibilitychange", follow, { signal: closed });
+  look();
   alerts.listen(look, closed);
 }
