@@ -30,8 +30,8 @@ class Speaker {
   async start(): Promise<void> {
     // Where there is no sound device, Firefox waits for one without end.
     const late = new Promise<never>((_, reject) => setTimeout(reject, kMaxStartMs));
-    await Promise.race([this.#context.resume(), late]);
-    await this.#context.audioWorklet.addModule(workletAddress);
+    const ready = this.#context.resume().then(() => this.#context.audioWorklet.addModule(workletAddress));
+    await Promise.race([ready, late]);
     this.#node = new AudioWorkletNode(this.#context, "speaker", { numberOfInputs: 0, outputChannelCount: [2] });
     this.#node.port.onmessage = ({ data }: MessageEvent<SpeakerReport>) =>
       this.clock.report(data.playedUs, data.contextTime, performance.now());

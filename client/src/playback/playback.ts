@@ -18,6 +18,8 @@ import { streamEnd } from "./stream_end";
 const kTailDelayMs = 1_000;
 /** Between attempts to get a lost stream back. */
 const kRetryMs = 1_000;
+/** After so many streams in a row that give nothing but the frame on the screen, footage ends, whatever it says. */
+const kMaxSilentStreams = 2;
 
 /** Where the frames go. */
 export interface PlaybackSink {
@@ -39,6 +41,7 @@ export class Playback {
   #isStreaming = false;
   /** Of the stream that sends frames; 0 while none does. */
   #key = 0;
+  #silentStreams = 0;
 
   constructor(recordings: Recordings, streams: FootageStream, opened: OpenFootage, rate: number, sink: PlaybackSink) {
     this.#recordings = recordings;
@@ -72,18 +75,26 @@ export class Playback {
 
   async #playStream(from: number, signal: AbortSignal): Promise<"ended" | "preempted" | "lost" | "more"> {
     const { shown } = this.#sink;
+    const begunMs = performance.now();
     this.#isStreaming = true;
     try {
       return await this.#whatFollows(await this.#showFrames(from, signal), signal);
     } catch (error) {
       const failure = asServerError(error);
       // A stream that has shown a picture can be had again.
-      if (shown.hasBegun && isPassing(failure)) return "lost";
-      throw failure;
+      if (!shown.hasBegun || !isPassing(failure)) throw failure;
+      return this.#isOver(from, performance.now() - begunMs) ? "ended" : "lost";
     } finally {
       this.#isStreaming = false;
       this.#key = 0;
     }
+  }
+
+  /** After a stream from that frame on was lost, which lasted so long. */
+  #isOver(from: number, ms: number): boolean {
+    const isSilent = this.#key !== 0 && this.#sink.shown.index === from && ms >= kMaxSilenceMs && !this.#opened.footage.isGrowing;
+    this.#silentStreams = isSilent ? this.#silentStreams + 1 : 0;
+    return this.#silentStreams >= kMaxSilentStreams;
   }
 
   /** Resolves with whether the stream is known to have ended after the last frame. */

@@ -3,7 +3,8 @@
 // Decodes recorded video, frame by frame, into pictures in the order in which they are shown.
 //
 // Why so        A decoder holds frames back until it knows their order, and takes some time: so it is fed until enough
-//               pictures are ready, and its frames are known by their timestamps.
+//               pictures are ready, and its frames are known by their timestamps. Some decoders take frames for ever and
+//               give no picture, or stand still: then the recording is played as pictures.
 
 import { frameInfoOf, type VideoCodec } from "../live/annexb";
 import { ServerError } from "../wire/server";
@@ -13,6 +14,9 @@ export const kNotStreamed = 406;
 /** Each takes some megabytes. */
 const kMaxReady = 3;
 const kMaxQueued = 4;
+/** Between two pictures; decoders hold up to 16 frames back. */
+const kMaxHeld = 64;
+const kMaxDecodeMs = 8_000;
 
 /** What the server says of a frame. */
 export interface FrameFacts {
@@ -28,11 +32,16 @@ export interface DecodedFrame extends FrameFacts {
 
 export class VideoDecoding {
   readonly #changed: () => void;
+  /** Of the frames that are in the decoder. */
   readonly #facts = new Map<number, FrameFacts>();
   readonly #ready: DecodedFrame[] = [];
   #decoder: VideoDecoder | null = null;
   #codecString = "";
   #failure: ServerError | null = null;
+  /** How many frames the decoder was given since its last picture. */
+  #held = 0;
+  #stalled: ReturnType<typeof setTimeout> | undefined;
+  #isFinishing = false;
 
   /** `changed` is called when a picture is ready, there is room again, or decoding has failed. */
   constructor(changed: () => void) {
@@ -50,8 +59,14 @@ export class VideoDecoding {
     if (this.#failure) throw this.#failure;
     if (!this.#decoder) return;
     if (facts) this.#facts.set(timestampUs, facts);
+    // What was given so long ago was left out.
+    const [oldest] = this.#facts.keys();
+    if (this.#facts.size > kMaxHeld) this.#facts.delete(oldest!);
+    this.#held += 1;
+    if (this.#held > kMaxHeld) throw undecodable();
     try {
       this.#decoder.decode(new EncodedVideoChunk({ type: isKey ? "key" : "delta", timestamp: timestampUs, data }));
+      this.#await();
     } catch {
       throw undecodable();
     }
@@ -65,10 +80,17 @@ export class VideoDecoding {
 
   /** Makes all pictures ready; the next frame must be a key frame. */
   async finish(): Promise<void> {
-    if (this.#decoder?.state === "configured") await this.#decoder.flush().catch(() => undefined);
+    if (this.#decoder?.state !== "configured") return;
+    this.#isFinishing = true;
+    this.#await();
+    // Closing the decoder ends it as well.
+    await this.#decoder.flush().catch(() => undefined);
+    this.#isFinishing = false;
+    clearTimeout(this.#stalled);
   }
 
   close(): void {
+    clearTimeout(this.#stalled);
     if (this.#decoder && this.#decoder.state !== "closed") this.#decoder.close();
     this.#decoder = null;
     for (const { picture } of this.#ready.splice(0)) picture.close();
@@ -82,18 +104,38 @@ export class VideoDecoding {
     if (this.#decoder?.state === "configured") this.#decoder.close();
     const decoder = new VideoDecoder({
       output: (picture) => this.#receive(picture),
-      error: () => {
-        this.#failure = undecodable();
-        this.#changed();
-      },
+      error: () => this.#fail(),
     });
-    decoder.addEventListener("dequeue", () => this.#changed());
+    decoder.addEventListener("dequeue", () => {
+      this.#await();
+      this.#changed();
+    });
     decoder.configure(config);
     this.#decoder = decoder;
     this.#codecString = codec;
   }
 
+  /** It goes on. As long as it has work, it is to go on; while nobody takes its pictures it may wait. */
+  #await(): void {
+    clearTimeout(this.#stalled);
+    if (!this.#isFinishing && !this.#decoder?.decodeQueueSize) return;
+    const giveUp = () => {
+      if (this.#ready.length > 0 && !this.#isFinishing) return this.#await();
+      if (this.#decoder?.state === "configured") this.#decoder.close();
+      this.#fail();
+    };
+    this.#stalled = setTimeout(giveUp, kMaxDecodeMs);
+  }
+
+  #fail(): void {
+    clearTimeout(this.#stalled);
+    this.#failure = undecodable();
+    this.#changed();
+  }
+
   #receive(picture: VideoFrame): void {
+    this.#held = 0;
+    this.#await();
     const facts = this.#facts.get(picture.timestamp);
     this.#facts.delete(picture.timestamp);
     if (!facts || !this.#decoder) return picture.close();

@@ -33,6 +33,7 @@ afterEach(() => {
 
 test.each([
   ["there is no sound device", () => never, () => Promise.resolve()],
+  ["the worklet does not come", () => Promise.resolve(), () => never],
   ["the worklet cannot be loaded", () => Promise.resolve(), () => Promise.reject(new Error())],
 ])("it is off again, and says why: %s", async (_name, resume, addModule) => {
   const { player, close } = playerWith(resume, addModule);

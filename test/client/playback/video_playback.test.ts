@@ -27,12 +27,14 @@ describe("a player of video", () => {
     stubDecoder();
     archive.recorded = [{ id: 7, camera: 1, start: 1000, stop: 1010, frames: 100 }];
     archive.isVideo = true;
+    archive.framesPerSecond = 100;
     archive.asked.length = archive.refused.length = shown.length = 0;
     player = new Player(new Recordings(new Server(() => undefined)), () => undefined);
     player.show = async ({ index, picture }: RecordedFrame) => void shown.push({ index, isVideo: !(picture instanceof Blob) });
   });
 
   afterEach(async () => {
+    vi.restoreAllMocks();
     player.close();
     await vi.waitFor(() => expect([archive.streams, FakePicture.open]).toEqual([[], 0]));
   });
@@ -109,6 +111,23 @@ describe("a player of video", () => {
     archive.streams[0]!.preempt();
     await until("preempted");
   });
+
+  test.each([
+    ["are silent", 20_000, 2, "ended"],
+    ["are cut", 100, 4, "lost"],
+  ])("footage that claims to go on is not asked for without end: streams that %s", async (_how, lastMs, streams, end) => {
+    const now = performance.now.bind(performance);
+    let passedMs = 0;
+    vi.spyOn(performance, "now").mockImplementation(() => now() + passedMs);
+    Object.assign(archive, { isVideo: false, framesPerSecond: 0.01 });
+    player.open(footage(), 0, true);
+    for (let stream = 1; stream <= streams; stream += 1) {
+      await vi.waitFor(() => expect([archive.asked.length, player.state.kind]).toEqual([stream, "playing"]));
+      passedMs += lastMs;
+      archive.streams[0]!.lose();
+      await until(stream === streams ? end : "lost");
+    }
+  }, 30_000);
 
   test("what is being recorded is followed to its end in one stream", async () => {
     Object.assign(archive.recorded[0]!, { frames: 20, isGrowing: true });

@@ -6,7 +6,7 @@ import type { RecordedFrame } from "../../../client/src/playback/frame_stream";
 import { RecordedSound } from "../../../client/src/playback/recorded_sound";
 import { readVideo } from "../../../client/src/playback/video_stream";
 import { part, videoPart } from "../support/fake_archive";
-import { FakePicture, stubDecoder } from "../support/fake_decoder";
+import { FakeDecoder, FakePicture, stubDecoder } from "../support/fake_decoder";
 
 const kHead = { headers: { "Content-Type": "multipart/x-mixed-replace; boundary=frame" } };
 const kEnd = Buffer.from("--frame--\r\n");
@@ -45,6 +45,25 @@ describe("a stream of video", () => {
     ["nothing of an empty recording", [kEnd], 0, [], true],
   ])("shows %s", async (_name, sent, from, shown, result) => {
     expect(await read(sent, from)).toEqual({ result, shown });
+  });
+
+  test.each([
+    ["takes all frames and gives no picture", "takes", 200, 0],
+    ["takes no more", "stands", 200, 0],
+    ["takes none, of a stream that is over", "stands", 3, 0],
+    ["does not come to the end", "flushes", 6, 4],
+  ] as const)("is left where the decoder %s, before long", async (_name, silence, frames, shown) => {
+    vi.useFakeTimers();
+    try {
+      FakeDecoder.silence = silence;
+      const sent = Array.from({ length: frames }, (_, index) => frame(index));
+      const left = read([...sent, kEnd]);
+      await vi.advanceTimersByTimeAsync(10_000);
+      const { result, shown: indexes } = await left;
+      expect([result, indexes.length]).toEqual([406, shown]);
+    } finally {
+      vi.useRealTimers();
+    }
   });
 
   test("ends when its frames are not taken any more, and closes what was decoded", async () => {

@@ -24,6 +24,8 @@ export class FakeDecoder extends EventTarget {
   static isSupported = true;
   /** The timestamp, in the stream, of a frame that cannot be decoded. */
   static brokenUs = NaN;
+  /** It gives no picture: it takes all frames, also when it is flushed, or none, or ends no flush. */
+  static silence: "takes" | "stands" | "flushes" | null = null;
   static async isConfigSupported(): Promise<{ supported: boolean }> {
     return { supported: FakeDecoder.isSupported };
   }
@@ -47,6 +49,7 @@ export class FakeDecoder extends EventTarget {
     this.#hasKey ||= type === "key";
     if (this.state !== "configured" || !this.#hasKey) throw new Error("not configured, or no key frame");
     this.decodeQueueSize += 1;
+    if (FakeDecoder.silence === "stands") return;
     setTimeout(() => {
       this.decodeQueueSize -= 1;
       if (this.state !== "configured") return;
@@ -54,14 +57,14 @@ export class FakeDecoder extends EventTarget {
         this.state = "closed";
         return this.#callbacks.error();
       }
-      this.#held.push(timestamp);
+      if (FakeDecoder.silence !== "takes") this.#held.push(timestamp);
       if (this.#held.length > kHeldBack) this.#callbacks.output(new FakePicture(this.#held.shift()!));
       this.dispatchEvent(new Event("dequeue"));
     });
   }
 
   async flush(): Promise<void> {
-    while (this.decodeQueueSize > 0 && this.state === "configured") await new Promise((resolve) => setTimeout(resolve));
+    while ((this.decodeQueueSize > 0 || FakeDecoder.silence === "flushes") && this.state === "configured") await new Promise((resolve) => setTimeout(resolve));
     if (this.state !== "configured") throw new Error("closed");
     for (const timestamp of this.#held.splice(0)) this.#callbacks.output(new FakePicture(timestamp));
   }
@@ -77,6 +80,7 @@ export class FakeDecoder extends EventTarget {
 export function stubDecoder(): void {
   FakeDecoder.isSupported = true;
   FakeDecoder.brokenUs = NaN;
+  FakeDecoder.silence = null;
   vi.stubGlobal("VideoDecoder", FakeDecoder);
   vi.stubGlobal(
     "EncodedVideoChunk",

@@ -10,6 +10,7 @@ import type { Footage } from "../../wire/footage";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
+import { notify } from "../widgets/notice";
 import { preciseTime, rateText, shortDate } from "../widgets/text";
 import { eventText } from "./event_list";
 import type { KeepButton } from "./keep_button";
@@ -49,6 +50,7 @@ export class Transport {
   readonly #after: HTMLButtonElement;
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
   readonly #sound: HTMLButtonElement;
+  #wasSoundOn = false;
   readonly #time = element("time", { class: "transport-time" }, kNoTime);
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
@@ -144,6 +146,9 @@ export class Transport {
     const { exists = false, isOn = false, error = "" } = this.#playback.active?.player.sound ?? {};
     this.#sound.hidden = !exists;
     this.#sound.setAttribute("aria-pressed", String(isOn));
+    // The browser may find out long after the click.
+    if (this.#wasSoundOn && !isOn && error) notify(`${error}.`);
+    this.#wasSoundOn = isOn;
     this.#sound.title = error || `Turn the sound ${isOn ? "off" : "on"} (M)`;
   }
 
