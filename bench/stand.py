@@ -11,7 +11,7 @@ import subprocess
 import sys
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
-from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, process_name, wait_until
+from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, process_name, recorded_events, wait_until
 
 
 def cpu_nanos(pids):

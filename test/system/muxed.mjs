@@ -5,6 +5,7 @@
 // Why so        What is drawn is measured on the canvas, not asked of the client: the light that runs along the lower
 //               edge of the test pattern tells the time at which a picture was made, and sound is taken where it leaves
 //               the page. LOOKHAVEN_WATCH_MS is how long each measurement takes.
+import { observeSound } from "./sound.mjs";
 import { address, logIn, report, visit } from "./visit.mjs";
 
 const watchMs = Number(process.env.LOOKHAVEN_WATCH_MS ?? 6000);
@@ -12,7 +13,7 @@ const watchMs = Number(process.env.LOOKHAVEN_WATCH_MS ?? 6000);
 /** Runs in the page, before its own scripts. */
 function observe() {
   const kPeriodMs = 4000;
-  const seen = (window.seen = { pictures: [], peak: 0 });
+  const seen = (window.seen = { pictures: [] });
 
   /** Milliseconds modulo kPeriodMs as the light shows them; null where there is no light. */
   const paintedMs = (context) => {
@@ -41,31 +42,20 @@ function observe() {
       seen.pictures.push({ painted, delayMs });
     });
   };
-
-  const connect = AudioNode.prototype.connect;
-  AudioNode.prototype.connect = function (target, ...rest) {
-    if (this instanceof AudioWorkletNode && target === this.context.destination) {
-      const ear = new AnalyserNode(this.context, { fftSize: 4096 });
-      connect.call(this, ear);
-      const samples = new Float32Array(ear.fftSize);
-      setInterval(() => {
-        ear.getFloatTimeDomainData(samples);
-        for (const sample of samples) seen.peak = Math.max(seen.peak, Math.abs(sample));
-      }, 40);
-    }
-    return connect.call(this, target, ...rest);
-  };
 }
 
 async function measure(page) {
-  await page.evaluate(() => Object.assign(window.seen, { pictures: [], peak: 0, sinceMs: performance.now() }));
+  await page.evaluate(() => {
+    window.sound.peak = 0;
+    Object.assign(window.seen, { pictures: [], sinceMs: performance.now() });
+  });
   await page.waitForTimeout(watchMs);
   return page.evaluate(() => {
-    const { pictures, peak, sinceMs } = window.seen;
+    const { pictures, sinceMs } = window.seen;
     const seconds = (performance.now() - sinceMs) / 1000;
     // The light comes back to the same place, so a picture is compared with the one before it only.
     const moments = pictures.filter(({ painted }, index) => painted !== null && painted !== pictures[index - 1]?.painted).length;
-    return { seconds, peak, moments, delaysMs: pictures.map(({ delayMs }) => delayMs) };
+    return { seconds, peak: window.sound.peak, moments, delaysMs: pictures.map(({ delayMs }) => delayMs) };
   });
 }
 
@@ -77,6 +67,7 @@ async function setHidden(page, hidden) {
 }
 
 await visit(async (page, complaints) => {
+  await page.addInitScript(observeSound);
   await page.addInitScript(observe);
   await page.goto(address);
   await logIn(page);

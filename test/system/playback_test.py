@@ -1,12 +1,10 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # What was recorded comes back: the frame that was asked for is the frame that is shown, at the pace that was asked for,
-# through the web server; and a session's players give way to each other. growing_test.py has what is still being recorded.
-import base64
+# through the web server; and a session's players give way to each other. playback_visits_test.py looks through a browser,
+# growing_test.py has what is still being recorded.
 import contextlib
-import hashlib
 import http.client
-import json
 import os
 import pathlib
 import re
@@ -14,35 +12,13 @@ import signal
 import subprocess
 import time
 import unittest
-import zipfile
 
-from installation import Installation, call, recorded_events, wait_until
-from painted import NumberReader
+from demo_footage import DemoFootageTest
+from installation import call, wait_until
 from players import BY_TIME, FAR, numbered, pictures, playing, steer
-from visit import Visit
 
 
-class PlaybackTest(unittest.TestCase):
-    """The demo's recordings: 20 s of 640x360 at 25 pictures a second, and the number painted is the frame's."""
-
-    @classmethod
-    def setUpClass(cls):
-        cls.server = cls.enterClassContext(Installation(LOOKHAVEN_DEMO_FOOTAGE="yes"))
-        cls.event = cls.finished(1)
-        with playing(cls.server, cls.event["id"]) as parts:
-            cls.reader = NumberReader([picture for _, picture in numbered(parts, 30)], 640, 360)
-
-    @classmethod
-    def finished(cls, camera):
-        """The newest of them, not what was recorded live since: on a busy machine that has gaps, and ends early."""
-        of_demo = (event for event in recorded_events(cls.server, camera) if event["frame_count"] == 20 * 25)
-        return next(event for event in of_demo if not event["is_recording"])
-
-    @staticmethod
-    def captured(event, number):
-        """When the picture of that painted number was taken."""
-        return f"{event['start'] + number // 25}.{number % 25 * 40:03}"
-
+class PlaybackTest(DemoFootageTest):
     def check(self, pairs, expected):
         """The numbers told are those expected, and so are those painted."""
         self.assertEqual([number for number, _ in pairs], expected)
@@ -115,78 +91,6 @@ class PlaybackTest(unittest.TestCase):
             self.assertAlmostEqual(position["position_ms"], self.reader.read(shown)[-1] * 40, delta=400)
             self.assertEqual(steer(self.server, "Stop").status, 200)
             wait_until(parts.ends, 3, "it stops")
-
-    def test_a_visit_finds_the_picture_of_a_time(self):
-        span = {"EVENT_START": str(self.event["start"]), "EVENT_MIDDLE": str(self.event["start"] + 8)}
-        marks = {kind: self.mark(kind) for kind in ("alert", "pos")}
-        links = ",".join(f"{kind}={mark['id']}" for kind, (mark, _) in marks.items())
-        with Visit("events.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", MARKS=links, **span) as visit:
-            def see(step, event=self.event, is_number_told=True, texts=("time", "caption")):
-                seen = visit.see(step)
-                painted = seen["painted"] = self.reader.read([base64.b64decode(seen["picture"])])[0]
-                if is_number_told:
-                    self.assertEqual(painted, seen["told"], f"{step}: the picture is the frame that is named")
-                clock = time.strftime("%H:%M:%S", time.gmtime(event["start"] + painted // 25))
-                for text in texts:
-                    self.assertEqual(seen[text].split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
-                return seen
-
-            found = see("found")
-            self.assertLess(abs(found["told"] - 8 * 25), 25, "the time that was clicked, as far as the timeline can be read")
-            self.assertTrue(visit.see("stands still")["same"])
-            self.assertEqual(see("one on")["told"], found["told"] + 1)
-            self.assertEqual(see("two back")["told"], found["told"] - 1)
-            jumped = see("jumped")
-            self.assertLess(abs(jumped["told"] - found["told"] - jumped["by"] * 25), 25)
-            dragged = see("dragged", is_number_told=False, texts=["caption"])
-            self.assertLess(abs(found["told"] - dragged["painted"] - dragged["by"] * 25), 25 + 25)
-            self.assertGreater(see("let go")["told"], dragged["painted"] - 25, "it plays on from there")
-            for kind, (mark, recording) in marks.items():
-                opened = see(kind, recording, is_number_told=False)
-                self.assertGreater(opened["told"], 0)
-                place = call("VEXO.Event", "Next", cameralists="1,2,4", time=mark["start"], event=mark["id"])
-                following = self.server.request(place, "admin").json["data"]["event"]
-                self.assertIn(time.strftime("%H:%M", time.gmtime(following.get("time", following["start"]))), opened["next"])
-            walked = visit.see("walked")
-            self.assertEqual(walked["address"].partition("&")[0], f"#{following['kind']}={following['id']}")
-            self.assertIn(walked["notice"], opened["next"])
-            self.assertGreater(walked["stills"], 1)
-            exported = visit.see("exported")
-            with zipfile.ZipFile(f"{visit.folder}/{exported['file']}") as archive:
-                for camera in json.loads(archive.read("manifest.json"))["camera"]:
-                    for file in camera["file"]:
-                        self.assertEqual(hashlib.sha256(archive.read(file["name"])).hexdigest(), file["sha256"])
-            self.assertEqual(exported["complaints"], [])
-
-    def test_a_visit_plays_video_as_it_was_recorded(self):
-        h264 = self.finished(2)
-        events = {"H264_EVENT": str(h264["id"]), "MJPEG_EVENT": str(self.event["id"])}
-        with Visit("recorded_video.mjs", f"http://127.0.0.1:{self.server.port}/", TZ="UTC", **events) as visit:
-            def see(step, event=h264):
-                seen = visit.see(step)
-                painted = self.reader.read([base64.b64decode(seen["picture"])])[0]
-                self.assertEqual(painted, seen["told"], "the picture is the frame that is named")
-                clock = time.strftime("%H:%M:%S", time.gmtime(event["start"] + painted // 25))
-                self.assertEqual(seen["caption"].split()[-1], f"{clock}.{painted % 25 * 40 // 100}")
-                return seen
-
-            paused = see("paused")
-            self.assertGreater(paused["video"], 20)
-            self.assertEqual(paused["pictures"], 0)
-            self.assertEqual(see("stepped")["told"], paused["told"] + 1)
-            for step in ("heard", "twice as fast"):
-                self.assertEqual(see(step)["pictures"], 0)
-            self.assertEqual(see("four times as fast")["video"], 0)
-            jpeg = see("motion jpeg", self.event)
-            self.assertEqual(jpeg["video"], 0)
-            self.assertEqual(jpeg["complaints"], [])
-
-    def mark(self, kind):
-        """One of camera 1, and the recording that it lies in."""
-        mark = self.server.request(call("VEXO.Event", "List", kind=kind, cameralists=1), "admin").json["data"]["event"][0]
-        self.assertEqual(mark["state"], "saved")
-        events = recorded_events(self.server, 1, **{"from": mark["start"] - 60})
-        return mark, next(event for event in events if event["start"] <= mark["start"] < event["stop"])
 
     def test_gives_a_picture_of_any_time(self):
         for camera, event, key_frame in ((1, self.event, 77), (2, self.finished(2), 75)):

@@ -5,28 +5,16 @@
 //
 // Why so        What is drawn and heard is observed where it leaves the page: decoded video is drawn as such, pictures
 //               are drawn as bitmaps.
+import { observeSound } from "./sound.mjs";
 import { address, folder, logIn, report, visit } from "./visit.mjs";
 
 /** Runs in the page, before its own scripts. */
 function observe() {
-  const seen = (window.seen = { video: 0, pictures: 0, peak: 0 });
+  const seen = (window.seen = { video: 0, pictures: 0 });
   const drawImage = CanvasRenderingContext2D.prototype.drawImage;
   CanvasRenderingContext2D.prototype.drawImage = function (image, ...place) {
     drawImage.call(this, image, ...place);
     if (this.canvas.closest(".stage-picture")) seen[image instanceof VideoFrame ? "video" : "pictures"] += 1;
-  };
-  const connect = AudioNode.prototype.connect;
-  AudioNode.prototype.connect = function (target, ...rest) {
-    if (this instanceof AudioWorkletNode && target === this.context.destination) {
-      const ear = new AnalyserNode(this.context, { fftSize: 4096 });
-      connect.call(this, ear);
-      const samples = new Float32Array(ear.fftSize);
-      setInterval(() => {
-        ear.getFloatTimeDomainData(samples);
-        for (const sample of samples) seen.peak = Math.max(seen.peak, Math.abs(sample));
-      }, 40);
-    }
-    return connect.call(this, target, ...rest);
   };
 }
 
@@ -34,7 +22,11 @@ await visit(async (page, complaints) => {
   const settled = (state) => page.locator(`.stage-picture[data-state="${state}"]`).waitFor({ timeout: 15_000 });
   const untilFrame = (least) =>
     page.waitForFunction((wanted) => Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)?.[1]) >= wanted, least);
-  const forget = () => page.evaluate(() => Object.assign(window.seen, { video: 0, pictures: 0, peak: 0 }));
+  const forget = () =>
+    page.evaluate(() => {
+      window.sound.peak = 0;
+      Object.assign(window.seen, { video: 0, pictures: 0 });
+    });
   const shown = () =>
     page.evaluate(() => ({
       picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
@@ -52,6 +44,7 @@ await visit(async (page, complaints) => {
     await settled("paused");
   };
 
+  await page.addInitScript(observeSound);
   await page.addInitScript(observe);
   await page.goto(`${address}#event=${process.env.H264_EVENT}`);
   await logIn(page);
@@ -71,7 +64,7 @@ await visit(async (page, complaints) => {
   await settled("playing");
   await page.getByRole("button", { name: "Sound" }).click();
   await page.locator('.transport button[aria-pressed="true"][aria-label="Sound"]').waitFor();
-  await page.waitForFunction(() => window.seen.peak > 0.01 && window.seen.video > 50, null, { timeout: 20_000 });
+  await page.waitForFunction(() => window.sound.peak > 0.01 && window.seen.video > 50, null, { timeout: 20_000 });
   await page.screenshot({ path: `${folder}/heard.png` });
   await pause();
   await report("heard", await shown());
@@ -80,7 +73,7 @@ await visit(async (page, complaints) => {
   await forget();
   await page.keyboard.press(" ");
   await settled("playing");
-  await page.waitForFunction(() => window.seen.peak > 0.01 && window.seen.video > 25, null, { timeout: 20_000 });
+  await page.waitForFunction(() => window.sound.peak > 0.01 && window.seen.video > 25, null, { timeout: 20_000 });
   await pause();
   await report("twice as fast", await shown());
 
