@@ -55,6 +55,7 @@ import "./style/events.css";
 import "./style/calendar.css";
 import "./style/event_filter.css";
 import "./style/event_list.css";
+import "./style/mark_text.css";
 import "./style/timeline.css";
 import "./style/map.css";
 import "./style/map_editor.css";

@@ -7,7 +7,7 @@ import unittest
 
 from api_test import call, play
 from docs_test import PNG
-from installation import Installation
+from installation import Installation, recorded_events, wait_until
 from visit import Visit
 
 JSON = {"Content-Type": "application/json"}
@@ -129,11 +129,18 @@ class EmapTest(unittest.TestCase):
         script = "<script>top.document.title = 'harmed'</script><rect width='9' height='9' onload='top.document.title=1'/>"
         harm.write_text(f"<svg xmlns='http://www.w3.org/2000/svg' width='40' height='30'>{script}</svg>")
         self.command("emap", "add", "Harmful", str(harm))
+        wait_until(lambda: recorded_events(self.server, 1), 30, "footage, before which nothing can have happened")
+        for number in range(6):
+            sale = {"kind": "pos", "camera": 1, "text": f"Tea {number}"}
+            self.assertEqual(self.server.request(call("VEXO.Event", "Mark"), "admin", form=sale).status, 200)
         with Visit("maps.mjs", f"http://127.0.0.1:{self.server.port}/") as visit:
             seen = visit.see("shown")
             self.assertEqual((seen["items"], seen["picture"]), (9, [1200, 800]))
             self.assertEqual(visit.see("camera")["hash"], "#map=1&camera=1")
             self.assertEqual(visit.see("link")["hash"], "#map=2")
+
+            sales = visit.see("sales")["sales"]
+            self.assertEqual([sale.rpartition(" · ")[2] for sale in sales], [f"Tea {number}" for number in (5, 4, 3, 2, 1)])
 
             seen = visit.see("moved")
             self.assertEqual(seen["undone"], seen["before"])

@@ -110,7 +110,8 @@ await visit(async (page, complaints) => {
     await page.keyboard.press(" ");
     await settled("paused");
     const after = page.locator('[aria-label^="Next event: "]');
-    await report(kind, { ...(await shown()), next: await after.getAttribute("aria-label", { timeout: 5000 }) });
+    const said = await text(".mark-text:not([hidden]) p");
+    await report(kind, { ...(await shown()), said, next: await after.getAttribute("aria-label", { timeout: 5000 }) });
   }
   await page.keyboard.press("ArrowDown");
   await page.locator(".notice.shown").waitFor();

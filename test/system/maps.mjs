@@ -38,7 +38,11 @@ await visit(async (page, complaints) => {
   await item(page, "Warehouse").waitFor();
   await report("link", { hash: new URL(page.url()).hash });
   await page.goBack();
-  await item(page, "POS terminal").waitFor();
+  await item(page, "POS terminal").click();
+  await page.locator(".map-card-sales li").first().waitFor();
+  await page.screenshot({ path: `${folder}/sales.png` });
+  await report("sales", { sales: await page.locator(".map-card-sales li").allTextContents() });
+  await page.keyboard.press("Escape");
 
   await page.getByRole("button", { name: "Edit the map" }).click();
   const terminal = page.locator(".map-editor .map-item").filter({ hasText: "POS terminal" });

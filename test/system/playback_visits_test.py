@@ -47,6 +47,7 @@ class PlaybackVisitsTest(DemoFootageTest):
             for kind, (mark, recording) in marks.items():
                 opened = see(kind, recording, is_number_told=False)
                 self.assertGreater(opened["told"], 0)
+                self.assertEqual(opened["said"], "\n".join(mark["text"]))
                 place = call("VEXO.Event", "Next", cameralists="1,2,4", time=mark["start"], event=mark["id"])
                 following = self.server.request(place, "admin").json["data"]["event"]
                 self.assertIn(time.strftime("%H:%M", time.gmtime(following.get("time", following["start"]))), opened["next"])

@@ -154,6 +154,13 @@ export class Recordings {
     return event.map(markOf);
   }
 
+  /** The newest POS transactions of a camera. */
+  async sales(camera: number, count: number): Promise<Footage[]> {
+    const asked = { kind: "pos", limit: String(count), cameralists: String(camera) };
+    const { event } = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", asked, { quiet: true });
+    return event.map(markOf);
+  }
+
   /** The kept recordings of the span, with their notes. */
   async kept(fromS: number, toS: number, cameras: readonly number[]): Promise<Footage[]> {
     const span = { from: String(fromS), to: String(toS), limit: String(kMaxMarks) };

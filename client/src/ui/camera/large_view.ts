@@ -15,6 +15,7 @@ import { magnify } from "../widgets/magnify";
 import { notify } from "../widgets/notice";
 import { signalText } from "../widgets/text";
 import { LivePicture } from "./live_picture";
+import { recordingsButtons } from "./recordings_buttons";
 
 export interface LargeViewActions {
   back(): void;
@@ -131,6 +132,7 @@ export class LargeView {
     const buttons = [
       this.#soundButton,
       ...(this.#actions.step ? stepButtons : []),
+      ...recordingsButtons(this.camera),
       iconButton("snapshot", "Snapshot", () => this.#actions.snapshot(), "S"),
       fullScreenButton(),
     ];

@@ -3,11 +3,12 @@
 // The events and marks of a span as cards with a picture each, newest first; only those on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
-import { describe, isSameFootage, type Footage, type FootageRef } from "../../wire/footage";
+import { describe, type Footage, type FootageRef } from "../../wire/footage";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
+import { isInRow, type EventRow } from "./folded_events";
 import { StillLoader } from "./still_loader";
 
 /** Rows kept beyond the visible ones, so that scrolling shows no gap. */
@@ -53,7 +54,7 @@ export class EventList {
   readonly #space = element("div", { class: "list-space", role: "list" });
   readonly #note = element("p", { class: "list-note" });
   readonly #resized = new ResizeObserver(() => this.#render());
-  #footage: readonly Footage[] = [];
+  #rows: readonly EventRow[] = [];
   #selected: FootageRef | null = null;
   #mustReveal = false;
   /** The row that the keys move. */
@@ -78,8 +79,8 @@ export class EventList {
   }
 
   /** Newest first. `note` says why there is nothing, or not all. */
-  show(footage: readonly Footage[], head: string, note: string): void {
-    this.#footage = footage;
+  show(rows: readonly EventRow[], head: string, note: string): void {
+    this.#rows = rows;
     setText(this.#head, head);
     setText(this.#note, note);
     this.#revealSelected();
@@ -105,10 +106,10 @@ export class EventList {
 
   /** Keeps a new selection in sight while more rows come above it, until the user scrolls. */
   #revealSelected(): void {
-    const at = this.#mustReveal ? this.#footage.findIndex((one) => isSameFootage(one, this.#selected)) : -1;
+    const at = this.#mustReveal ? this.#rows.findIndex((one) => isInRow(one, this.#selected)) : -1;
     if (at < 0) return;
     // The new rows must have made room before it can be scrolled to.
-    this.#space.style.height = `${this.#footage.length * this.#rowPx}px`;
+    this.#space.style.height = `${this.#rows.length * this.#rowPx}px`;
     this.#reveal(at);
   }
 
@@ -120,13 +121,13 @@ export class EventList {
 
   #render(): void {
     const row = this.#rowPx;
-    this.#space.style.height = `${this.#footage.length * row}px`;
+    this.#space.style.height = `${this.#rows.length * row}px`;
     const first = Math.max(0, Math.floor(this.#box.scrollTop / row) - kOverscanRows);
-    const last = Math.min(this.#footage.length, Math.ceil((this.#box.scrollTop + this.#box.clientHeight) / row) + kOverscanRows);
+    const last = Math.min(this.#rows.length, Math.ceil((this.#box.scrollTop + this.#box.clientHeight) / row) + kOverscanRows);
     const kept = new Map([...this.#space.children].map((child) => [(child as HTMLElement).dataset["ref"], child]));
-    const wanted = this.#footage.slice(first, last).map((one, index) => {
-      const old = kept.get(`${one.kind}${one.id}`) as HTMLElement | undefined;
-      const made = old ?? this.#newRow(one);
+    const wanted = this.#rows.slice(first, last).map((one, index) => {
+      const old = kept.get(`${one.footage.kind}${one.footage.id}`) as HTMLElement | undefined;
+      const made = old ?? this.#newRow(one.footage);
       this.#fill(made, one, first + index, row);
       return made;
     });
@@ -145,8 +146,8 @@ export class EventList {
     const kept = element("span", { class: "row-kept" }, icon("kept"), element("span", { class: "unseen" }, "kept"));
     const button = element("button", { type: "button", class: "row-open" }, ...parts, still, kept);
     const shown = (act: (footage: Footage) => void) => () => {
-      const one = this.#footage[Number(row.dataset["at"])];
-      if (one) act(one);
+      const one = this.#rows[Number(row.dataset["at"])];
+      if (one) act(one.footage);
     };
     const all = iconButton("sameMoment", "Same moment on all cameras", shown((footage) => this.#actions.sameMoment(footage)));
     all.classList.add("row-all");
@@ -155,7 +156,8 @@ export class EventList {
     return row;
   }
 
-  #fill(row: HTMLElement, one: Footage, at: number, rowPx: number): void {
+  #fill(row: HTMLElement, shown: EventRow, at: number, rowPx: number): void {
+    const { footage: one, ids, seconds, isGrowing } = shown;
     const [button, all] = [...row.children] as [HTMLButtonElement, HTMLButtonElement];
     const [swatch, time, name, text, side] = [...button.children] as [HTMLElement, HTMLElement, HTMLElement, HTMLElement, HTMLElement];
     const kind = kindOf(one);
@@ -166,15 +168,15 @@ export class EventList {
     setText(time, one.found ? minuteText(one.moment * 1000) : clockTime(one.moment * 1000));
     setText(name, this.#nameOf(one.camera));
     if (one.found) text.replaceChildren(...foundLines(one.found));
-    else setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? "" : kKindNames[kind]);
-    setText(side, one.isGrowing ? "recording" : one.isSaved ? duration(one.stop - one.start) : "no footage");
-    side.classList.toggle("recording", one.isGrowing);
+    else setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? (ids.length > 1 ? `${ids.length} recordings` : "") : kKindNames[kind]);
+    setText(side, isGrowing ? "recording" : one.isSaved ? duration(seconds) : "no footage");
+    side.classList.toggle("recording", isGrowing);
     button.querySelector<HTMLElement>(".row-kept")!.hidden = !one.isKept;
     button.disabled = !one.isSaved;
     all.disabled = !one.isSaved;
-    all.tabIndex = button.tabIndex = at === Math.min(this.#at, this.#footage.length - 1) ? 0 : -1;
+    all.tabIndex = button.tabIndex = at === Math.min(this.#at, this.#rows.length - 1) ? 0 : -1;
     button.title = [`${shortDate(one.moment * 1000)} ${clockTime(one.moment * 1000)}`, describe(one)].filter(Boolean).join("\n");
-    button.setAttribute("aria-current", String(isSameFootage(one, this.#selected)));
+    button.setAttribute("aria-current", String(isInRow(shown, this.#selected)));
     // A mark's footage may come later than its row.
     if (one.isSaved && !row.dataset["still"]) {
       row.dataset["still"] = "asked";
@@ -190,7 +192,7 @@ export class EventList {
     if (!row || step === 0) return;
     event.preventDefault();
     event.stopPropagation();
-    this.#at = Math.max(0, Math.min(Number(row.dataset["at"]) + step, this.#footage.length - 1));
+    this.#at = Math.max(0, Math.min(Number(row.dataset["at"]) + step, this.#rows.length - 1));
     this.#reveal(this.#at);
     this.#render();
     this.#space.querySelector<HTMLElement>(`[data-at="${this.#at}"] button`)?.focus({ preventScroll: true });

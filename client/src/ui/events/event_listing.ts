@@ -6,6 +6,7 @@ import type { Footage } from "../../wire/footage";
 import type { Calendar } from "./calendar";
 import type { EventFilter } from "./event_filter";
 import type { EventList } from "./event_list";
+import { foldContinuous, rowOf } from "./folded_events";
 
 /** The list is for reading: a longer one is cut, and says so. */
 const kMaxRows = 20_000;
@@ -21,10 +22,11 @@ export function listEvents(
   span: string,
   whyNone: string,
 ): void {
-  const rows = recorded
+  const events = recorded
     .filter((one) => filter.admits(one))
     .sort((one, other) => other.start - one.start || other.id - one.id);
-  const head = `${rows.length} ${rows.length === 1 ? "event" : "events"} · ${span}`;
+  const rows = filter.choice.isKeptOnly ? events.map(rowOf) : foldContinuous(events);
+  const head = `${events.length} ${events.length === 1 ? "event" : "events"} · ${span}`;
   const note = rows.length > kMaxRows ? "Show less time to list older events." : rows.length > 0 ? "" : whyNone;
   list.show(rows.slice(0, kMaxRows), head, note);
 }

@@ -19,7 +19,7 @@ export class EventsLayout {
   readonly #panels = new Choice<keyof typeof kPanels>("Show", kPanels, "list", (panel) => (this.root.dataset["panel"] = panel));
 
   constructor(stage: Stage, transport: Transport, exporting: ExportPanel, overview: Overview) {
-    const { timeline, calendar, filter, list } = overview;
+    const { timeline, calendar, filter, list, markText } = overview;
     const zoom = element(
       "div",
       { class: "timeline-zoom", role: "group", "aria-label": "Span of the timeline" },
@@ -28,7 +28,7 @@ export class EventsLayout {
       iconButton("now", "Show now", () => timeline.showNow()),
     );
     transport.root.append(zoom);
-    const side = element("div", { class: "side" }, calendar.root, filter.root, list.root);
+    const side = element("div", { class: "side" }, markText.root, calendar.root, filter.root, list.root);
     const below = [transport.root, exporting.root, this.#panels.root, timeline.root];
     this.root.append(element("div", { class: "events-main" }, stage.root, ...below), side);
   }

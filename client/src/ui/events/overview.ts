@@ -15,6 +15,8 @@ import { Calendar } from "./calendar";
 import { EventFilter, type ListChoice } from "./event_filter";
 import { EventList } from "./event_list";
 import { listEvents, whyNoEvents } from "./event_listing";
+import { rowOf } from "./folded_events";
+import { markAt, MarkText } from "./mark_text";
 import { TextSearch } from "./text_search";
 
 const kDebounceMs = 150;
@@ -34,6 +36,7 @@ export class Overview {
   readonly list: EventList;
   readonly timeline: Timeline;
   readonly calendar: Calendar;
+  readonly markText = new MarkText();
   readonly #days: RecordedDays;
   readonly #search: TextSearch;
   readonly #actions: OverviewActions;
@@ -108,6 +111,8 @@ export class Overview {
     this.timeline.setPlayhead(playheadMs, footage, isPlaying);
     this.calendar.mark(footage && playheadMs);
     this.list.select(footage);
+    const atS = (playheadMs ?? 0) / 1000;
+    this.markText.show(footage && markAt([footage, ...this.cache.get(footage.camera, atS, atS).footage], atS));
   }
 
   /** Loads what the timeline shows now, and what has been recorded since. */
@@ -163,7 +168,7 @@ export class Overview {
 
   #showFootage(): void {
     this.timeline.redraw();
-    if (this.#search.isActive) return this.list.show(this.#search.found, this.#search.head, this.#search.note);
+    if (this.#search.isActive) return this.list.show(this.#search.found.map(rowOf), this.#search.head, this.#search.note);
     const { startMs, endMs } = this.timeline.scale;
     const span = spanText(startMs, Math.min(endMs, Date.now()));
     if (!this.timeline.showsEvents) return this.list.show([], span, "Show four days or less to list events.");

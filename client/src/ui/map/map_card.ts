@@ -1,13 +1,20 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A card beside the item that is pointed at: what it is, its state, and what its camera sees now.
+// A card beside the item that is pointed at: what it is, its state, and what its camera sees now; of a POS terminal the
+// last sales.
 
 import { SnapshotSource } from "../../live/snapshot_source";
+import type { Footage } from "../../wire/footage";
+import { Recordings } from "../../wire/recordings";
 import { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
+import { recordingsButtons } from "../camera/recordings_buttons";
 import { draw, element, setText } from "../widgets/dom";
-import { clockTime, shortDate } from "../widgets/text";
+import { clockTime, minuteText, shortDate } from "../widgets/text";
 import { kindName, type MapItemView } from "./map_item";
+
+/** Of a POS terminal. */
+const kSales = 5;
 
 export class MapCard {
   readonly root = element("div", { class: "card map-card", hidden: true });
@@ -15,6 +22,10 @@ export class MapCard {
   readonly #title = element("p", { class: "map-card-title" });
   readonly #text = element("p", { class: "quiet" });
   readonly #canvas = element("canvas", { role: "img" });
+  readonly #recordings: Recordings;
+  readonly #sales = element("ul", { class: "map-card-sales", "aria-label": "Last sales" });
+  /** To what was recorded of its camera. */
+  readonly #links = element("div", { class: "map-card-links" });
   readonly #open = element("button", { type: "button", class: "button" }, "Open its camera");
   readonly #semaphore = new Semaphore(1);
   #polling: AbortController | null = null;
@@ -22,7 +33,8 @@ export class MapCard {
 
   constructor(server: Server) {
     this.#server = server;
-    this.root.append(this.#canvas, this.#title, this.#text, this.#open);
+    this.#recordings = new Recordings(server);
+    this.root.append(this.#canvas, this.#title, this.#text, this.#sales, this.#open, this.#links);
   }
 
   get isPinned(): boolean {
@@ -44,11 +56,15 @@ export class MapCard {
     setText(this.#text, state ? `${kindName(view.item)}, ${state}${since}` : kindName(view.item));
     this.#canvas.hidden = true;
     this.#open.hidden = open === null;
+    this.#links.replaceChildren(...(open && camera ? recordingsButtons(camera) : []));
+    this.#sales.replaceChildren();
     this.root.classList.toggle("is-pinned", open !== null);
     this.#open.onclick = open;
     this.root.hidden = false;
     this.#placeBeside(view);
-    if (camera) void this.#showPicture(camera, view);
+    if (!camera) return;
+    void this.#showPicture(camera, view);
+    if (view.item.kind === "pos" && !camera.server) void this.#showSales(camera, view);
   }
 
   hide(): void {
@@ -73,6 +89,13 @@ export class MapCard {
     await source.run(show, polling.signal).catch(() => undefined);
   }
 
+  async #showSales(camera: Camera, view: MapItemView): Promise<void> {
+    const sales = await this.#recordings.sales(camera.id, kSales).catch(() => []);
+    if (this.#shown !== view) return;
+    this.#sales.replaceChildren(...sales.map(saleRow));
+    this.#placeBeside(view);
+  }
+
   /** To the right of the item or to its left; in a narrow window below or above it. Never over it. */
   #placeBeside(view: MapItemView): void {
     const frame = this.root.offsetParent?.getBoundingClientRect();
@@ -92,4 +115,10 @@ export class MapCard {
     this.root.style.left = `${left}px`;
     this.root.style.top = `${top}px`;
   }
+}
+
+/** The time of a sale and what was sold; leads to its recording, where there is one. */
+function saleRow({ id, moment, text, isSaved }: Footage): HTMLElement {
+  const told = `${minuteText(moment * 1000)} · ${text.replaceAll("\n", " · ")}`;
+  return element("li", { title: text }, isSaved ? element("a", { href: `#pos=${id}` }, told) : told);
 }

@@ -13,6 +13,7 @@ import { secretField } from "../widgets/fields";
 import { openDialog } from "../widgets/form_dialog";
 import { icon, type IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";
+import { zoneText } from "../widgets/text";
 import { AlertNotifications } from "./alert_notifications";
 import type { Session } from "./session";
 
@@ -39,6 +40,7 @@ export class AccountMenu {
       "dialog",
       { class: "card account-menu", "aria-label": `Account ${name}` },
       element("p", { class: "account-name" }, name),
+      element("p", { class: "account-name account-zone" }, `Times are those of ${zoneText(new Date())}`),
       this.#item("edit", "Change password", "change-password", () => void this.#changePassword()),
       this.#item("hosts", "Your sessions", "own-sessions", () => void this.#showSessions()),
       ...(AlertNotifications.arePossible ? [this.#notifications()] : []),

@@ -3,6 +3,7 @@
 // What is open on the events' screen, as a part of the address: #events, or #event=7, #alert=8 or #pos=9, and behind it
 //
 //   &at=1764183438123            the picture of that Unix time in milliseconds
+//   &play=1                      plays from there
 //   &layout=2&cameras=1,0,4      how many cells a row has, and their cameras in order, 0 for an empty one
 //   &large=4                     the camera of these that is shown alone
 //   &filter=1,4&kinds=alarm,pos  which cameras and kinds of events are listed; without kinds all
@@ -20,6 +21,8 @@ export interface EventsAddress {
   /** Null where nothing was recorded, or nothing plays. */
   footage: FootageRef | null;
   atMs: number | null;
+  /** From that time on. */
+  isPlaying: boolean;
   stage: { plan: StagePlan; large: number | null } | null;
   filter: ListChoice | null;
 }
@@ -42,6 +45,7 @@ export function parseEventsAddress(hash: string): EventsAddress | null {
   return {
     footage: kind ? { kind, id: number(kind)! } : null,
     atMs: number("at"),
+    isPlaying: said.has("play"),
     stage: layout && cells ? { plan: { layout, cells }, large: number("large") } : null,
     filter: listed && {
       cameras: listed,
@@ -52,10 +56,17 @@ export function parseEventsAddress(hash: string): EventsAddress | null {
   };
 }
 
-export function formatEventsAddress({ footage, atMs, stage, filter }: EventsAddress): string {
+/** Of the recordings of one camera; where a time is given, they are played from there on. */
+export function cameraAddress(camera: number, atMs: number | null): string {
+  const stage = { plan: { layout: 1 as const, cells: [camera] }, large: null };
+  return formatEventsAddress({ footage: null, atMs, isPlaying: atMs !== null, stage, filter: null });
+}
+
+export function formatEventsAddress({ footage, atMs, isPlaying, stage, filter }: EventsAddress): string {
   const parts = [footage ? `#${footage.kind}=${footage.id}` : "#events"];
   // Not rounded down, which would lead to the frame before.
   if (atMs !== null) parts.push(`at=${Math.ceil(atMs)}`);
+  if (isPlaying) parts.push("play=1");
   if (stage) parts.push(`layout=${stage.plan.layout}`, `cameras=${stage.plan.cells.map((camera) => camera ?? 0).join()}`);
   if (stage && stage.large !== null) parts.push(`large=${stage.large}`);
   if (filter && filter.cameras.length > 0) parts.push(`filter=${filter.cameras.join()}`, ...moreOf(filter));

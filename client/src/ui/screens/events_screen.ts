@@ -200,12 +200,12 @@ export class EventsScreen extends Screen {
     }
   }
 
-  async #openAddress({ footage: wanted, atMs, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
+  async #openAddress({ footage: wanted, atMs, isPlaying, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
     if (filter) this.#overview.follow(filter);
     if (stage) this.#stage.show(stage.plan, stage.large);
     // Back from what is being played ends it.
     if (!wanted && atMs === null) return this.#playback.close();
-    if (!wanted) return this.#jumps.to(atMs!, false);
+    if (!wanted) return this.#jumps.to(atMs!, isPlaying);
     if (atMs === null && isSameFootage(wanted, this.#playback.active?.player.footage)) return;
     const footage = await this.#recordings.find(wanted);
     if (!isWanted()) return;
@@ -247,7 +247,7 @@ export class EventsScreen extends Screen {
     if (playheadMs === null || isScrubbed || this.#isFollowing) return;
     const { plan, large } = this.#stage;
     const footage = active?.player.footage ?? null;
-    const address = { footage, atMs: playheadMs, stage: { plan, large }, filter: this.#overview.choice };
+    const address = { footage, atMs: playheadMs, isPlaying: false, stage: { plan, large }, filter: this.#overview.choice };
     recordEventsAddress(address, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
     this.#isNewEntry = false;
   }

@@ -8,6 +8,7 @@ import type { Unplayable } from "../../live/unplayable";
 import type { Semaphore } from "../../wire/semaphore";
 import type { Camera, Server } from "../../wire/server";
 import { LivePicture, type PictureState } from "../camera/live_picture";
+import { recordingsButtons } from "../camera/recordings_buttons";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { signalText } from "../widgets/text";
@@ -60,9 +61,12 @@ export class Tile {
       element("span", { class: "dot" }),
       element("span", { class: "tile-name", title: camera.name }, camera.name),
       this.#state,
-      absence
-        ? iconButton("close", `Take ${camera.name} off the wall`, () => actions.dismiss(camera))
-        : iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
+      ...(absence
+        ? [iconButton("close", `Take ${camera.name} off the wall`, () => actions.dismiss(camera))]
+        : [
+            ...recordingsButtons(camera),
+            iconButton("snapshot", `Snapshot of ${camera.name}`, () => actions.snapshot(camera), "S"),
+          ]),
     );
     this.root = element("article", { class: "tile", "data-camera": String(camera.id) }, picture, bar);
     this.picture.refresh();

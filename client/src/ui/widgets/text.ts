@@ -98,3 +98,12 @@ export function signalText(state: SignalState, pollIntervalMs = 0): string {
       return state.sinceMs === null ? "no signal" : `no signal since ${sinceText(state.sinceMs, Date.now())}`;
   }
 }
+
+/** "Europe/Berlin, UTC+01:00": the browser's, in which all times are shown. */
+export function zoneText(at: Date): string {
+  const { timeZone } = Intl.DateTimeFormat().resolvedOptions();
+  const minutes = -at.getTimezoneOffset();
+  const two = (number: number) => String(number).padStart(2, "0");
+  const offset = `${minutes < 0 ? "−" : "+"}${two(Math.floor(Math.abs(minutes) / 60))}:${two(Math.abs(minutes) % 60)}`;
+  return timeZone === "UTC" ? timeZone : `${timeZone}, UTC${offset}`;
+}

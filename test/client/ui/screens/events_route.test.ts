@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 
-import { formatEventsAddress, parseEventsAddress, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
+import { cameraAddress, formatEventsAddress, parseEventsAddress, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
 
 describe("an address of the events' screen", () => {
   const all = ["continuous", "alarm", "alert", "pos"] as const;
-  const nothing: EventsAddress = { footage: null, atMs: null, stage: null, filter: null };
+  const nothing: EventsAddress = { footage: null, atMs: null, isPlaying: false, stage: null, filter: null };
 
   test.each<[string, EventsAddress]>([
     ["#events", nothing],
@@ -15,6 +15,7 @@ describe("an address of the events' screen", () => {
       {
         footage: { kind: "event", id: 7 },
         atMs: 1764183438123,
+        isPlaying: false,
         stage: { plan: { layout: 2, cells: [1, null, 4, null] }, large: 4 },
         filter: { cameras: [1, 4], kinds: ["alarm", "pos"], isKeptOnly: true, words: "" },
       },
@@ -40,6 +41,15 @@ describe("an address of the events' screen", () => {
     ["#event=7&layout=2", null],
   ])("%s leaves the stage as it is", (hash, stage) => {
     expect(parseEventsAddress(hash)).toMatchObject({ footage: { id: 7 }, stage });
+  });
+
+  test.each([
+    ["from a time on", 1764183438123, "#events&at=1764183438123&play=1&layout=1&cameras=5"],
+    ["at all", null, "#events&layout=1&cameras=5"],
+  ])("of what a camera has %s", (_name, atMs, hash) => {
+    expect(cameraAddress(5, atMs)).toBe(hash);
+    const one = { plan: { layout: 1, cells: [5] }, large: null };
+    expect(parseEventsAddress(hash)).toEqual({ ...nothing, atMs, isPlaying: atMs !== null, stage: one });
   });
 
   test("leads to the frame that is shown, not to the one before", () => {

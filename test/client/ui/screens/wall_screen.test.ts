@@ -186,6 +186,18 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await allLive(page, 4);
   }, 40_000);
 
+  test("from a live picture to its recordings: all, and the last half a minute", async () => {
+    const page = await loggedIn(2);
+    await page.getByRole("button", { name: "Recordings of Camera <b>2</b>" }).click();
+    await page.locator(".stage-caption", { hasText: "Camera <b>2</b>" }).waitFor();
+    await page.goBack();
+    await page.click("[data-camera='1'] .tile-open");
+    const nowS = Date.now() / 1000;
+    await page.locator(".large").getByRole("button", { name: "Last 30 seconds of Camera <b>1</b>" }).click();
+    await page.locator(".stage-caption", { hasText: "Camera <b>1</b>" }).waitFor();
+    await page.waitForFunction((atS) => Math.abs(Number(document.querySelector(".timeline-lanes")!.getAttribute("aria-valuenow")) - atS) < 25, nowS - 30);
+  }, 40_000);
+
   test("over plain HTTP still pictures are shown, with a link to where there is more", async () => {
     const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
     await allLive(page, 2);

@@ -1,0 +1,17 @@
+// SPDX-License-Identifier: Apache-2.0
+
+import type { Camera } from "../../wire/server";
+import { cameraAddress } from "../screens/events_route";
+import { iconButton } from "../widgets/button";
+
+const kRecentMs = 30_000;
+
+/** From a camera's live picture to what was recorded of it; none for a paired host's camera, whose recordings are there. */
+export function recordingsButtons({ id, name, server }: Camera): HTMLButtonElement[] {
+  if (server) return [];
+  const go = (atMs: number | null) => void (location.hash = cameraAddress(id, atMs));
+  return [
+    iconButton("recent", `Last 30 seconds of ${name}`, () => go(Date.now() - kRecentMs)),
+    iconButton("events", `Recordings of ${name}`, () => go(null)),
+  ];
+}
