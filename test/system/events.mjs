@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, steps, a jump
-// and a drag; marks by their addresses, on to the event after, and its export with another camera's. EVENT_START and EVENT_MIDDLE are Unix seconds of a
-// recording of camera 1, MARKS are addresses of marks within its recordings.
+// One visit to what was recorded: from the calendar over the timeline to the picture of a time, then pause, snapshot,
+// steps, a jump and a drag; marks by their addresses, on to the event after, and its export with another camera's.
+// EVENT_START and EVENT_MIDDLE are Unix seconds of a recording of camera 1, MARKS are addresses of marks within its
+// recordings.
 import { download } from "../support/browsers.mjs";
 import { address, folder, logIn, report, visit } from "./visit.mjs";
 
@@ -61,6 +62,10 @@ await visit(async (page, complaints) => {
   await settled("paused");
   await page.screenshot({ path: `${folder}/events.png` });
   await report("found", await shown());
+  await page.keyboard.press("s");
+  const save = page.getByRole("dialog", { name: "Snapshot" }).getByRole("link", { name: "Download" });
+  await report("snapshot", { file: await download(page, () => save.click(), folder) });
+  await page.keyboard.press("Escape");
 
   const before = await shown();
   await page.waitForTimeout(700);

@@ -5,6 +5,7 @@
 import base64
 import hashlib
 import json
+import pathlib
 import time
 import unittest
 import zipfile
@@ -36,6 +37,8 @@ class PlaybackVisitsTest(DemoFootageTest):
 
             found = see("found")
             self.assertLess(abs(found["told"] - 8 * 25), 25, "the time that was clicked, as far as the timeline can be read")
+            snapshot = pathlib.Path(visit.folder, visit.see("snapshot")["file"]).read_bytes()
+            self.assertEqual(self.reader.read([snapshot]), [found["told"]])
             self.assertTrue(visit.see("stands still")["same"])
             self.assertEqual(see("one on")["told"], found["told"] + 1)
             self.assertEqual(see("two back")["told"], found["told"] - 1)

@@ -25,7 +25,8 @@ export class SnapshotDialog {
     return this.root.open;
   }
 
-  async take(camera: Camera): Promise<void> {
+  /** Of the camera's live picture, or of what `picture` gives. */
+  async take(camera: Camera, picture = (signal: AbortSignal) => this.#server.snapshot(camera, signal)): Promise<void> {
     this.#clear();
     const request = (this.#request = new AbortController());
     const waiting = element(
@@ -37,7 +38,7 @@ export class SnapshotDialog {
     this.#fill(camera, "", waiting);
     if (!this.root.open) this.root.showModal();
     try {
-      const snapshot = await this.#server.snapshot(camera, request.signal);
+      const snapshot = await picture(request.signal);
       const image = await createImageBitmap(snapshot.jpeg);
       if (!request.signal.aborted) this.#show(camera, snapshot, image);
       image.close();
@@ -45,7 +46,7 @@ export class SnapshotDialog {
       if (request.signal.aborted) return;
       const message = error instanceof ServerError ? error.message : "The picture cannot be shown.";
       const again = element("button", { type: "button", class: "button" }, "Try again");
-      again.addEventListener("click", () => void this.take(camera));
+      again.addEventListener("click", () => void this.take(camera, picture));
       this.#fill(
         camera,
         "",

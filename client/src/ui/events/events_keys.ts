@@ -14,6 +14,7 @@ export const kEventsKeys: KeyList = [
   ["Up Down", "The event before or after"],
   ["[ ]", "Slower or faster"],
   ["M", "Sound on or off"],
+  ["S", "Snapshot"],
   ["T", "Go to a time"],
   ["A", "Same moment on all cameras"],
   ["Enter", "Enlarge the active picture, or show all"],
@@ -59,6 +60,7 @@ function pressLetter(key: string, actions: EventsActions): boolean {
   else if (key === "j") actions.jump(-kJumpMs);
   else if (key === "l") actions.jump(kJumpMs);
   else if (key === "m") actions.sound();
+  else if (key === "s") actions.snapshot();
   else if (key === "t") actions.askTime();
   else if (key === "a") actions.sameMoment();
   else if (key === "n") actions.live();

@@ -6,11 +6,15 @@
 import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";
 import type { Still } from "../../wire/recordings";
+import type { Snapshot } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { magnify } from "../widgets/magnify";
 import { clockTime, preciseTime, shortDate } from "../widgets/text";
+
+/** Hardly to be told from what is shown. */
+const kSnapshotQuality = 0.95;
 
 export interface PlayerTileActions {
   /** Plays what has stopped. */
@@ -59,6 +63,16 @@ export class PlayerTile {
     this.root.addEventListener("pointerdown", actions.choose);
     magnify(this.root, this.#canvas, actions.enlarge);
     this.refresh(null);
+  }
+
+  /** What is shown, in full size; null where nothing is. */
+  snapshot(): Promise<Snapshot> | null {
+    if (!this.root.classList.contains("has-picture")) return null;
+    const takenMs = this.#still?.capturedMs ?? this.player.timeMs;
+    return new Promise((resolve, reject) => {
+      const take = (jpeg: Blob | null) => (jpeg ? resolve({ jpeg, takenMs }) : reject(new Error("no picture")));
+      this.#canvas.toBlob(take, "image/jpeg", kSnapshotQuality);
+    });
   }
 
   /** How wide a picture is drawn, in pixels of the screen. */

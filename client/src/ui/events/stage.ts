@@ -7,7 +7,7 @@ import { kStillWidths, type ScrubRequest } from "../../playback/scrub_stills";
 import type { SyncPlayback } from "../../playback/sync_playback";
 import type { Footage } from "../../wire/footage";
 import type { Still } from "../../wire/recordings";
-import type { Camera } from "../../wire/server";
+import type { Camera, Snapshot } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { PlayerTile } from "./player_tile";
 import { emptyCell } from "./stage_cell";
@@ -97,6 +97,13 @@ export class Stage {
       tile.isActive = this.cameras.length > 1 && camera === this.active;
       tile.refresh(this.#playback.playheadMs);
     }
+  }
+
+  /** Of the active camera; null where nothing is shown of it. */
+  snapshot(): { camera: Camera; picture: Promise<Snapshot> } | null {
+    const camera = this.#cameras.find(({ id }) => id === this.active);
+    const picture = camera ? this.#tiles.get(camera.id)?.snapshot() : null;
+    return camera && picture ? { camera, picture } : null;
   }
 
   /** What is to be fetched for a time: the active camera first. */

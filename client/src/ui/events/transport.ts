@@ -23,6 +23,8 @@ export interface TransportActions {
   rate(rate: number): void;
   /** By so many milliseconds. */
   jump(ms: number): void;
+  /** Of the active camera's picture. */
+  snapshot(): void;
   /** To a time that is typed. */
   askTime(): void;
   /** Shows what other cameras have at this moment. */
@@ -36,6 +38,7 @@ export interface TransportActions {
 
 export const kJumpMs = 10_000;
 const kNoTime = "Go to a time";
+const kSnapshot = "Snapshot";
 const kDownload = "Download this recording";
 const kMayNotDownload = "You may play the recordings of this camera, but not download them";
 
@@ -51,6 +54,7 @@ export class Transport {
   readonly #rate = element("select", { class: "rate input", "aria-label": "Rate", title: "Rate ([ and ])" });
   readonly #sound: HTMLButtonElement;
   #wasSoundOn = false;
+  readonly #snapshot: HTMLButtonElement;
   readonly #time = element("time", { class: "transport-time" }, kNoTime);
   readonly #frame = element("span", { class: "transport-frame" });
   readonly #growing = element("span", { class: "transport-growing recording", hidden: true }, "recording");
@@ -75,6 +79,7 @@ export class Transport {
     this.#play.classList.add("play");
     this.#play.append(icon("pause"));
     this.#sound = iconButton("soundOff", "Sound", () => actions.sound());
+    this.#snapshot = iconButton("snapshot", kSnapshot, () => actions.snapshot(), "S");
     this.#sound.classList.add("transport-sound");
     this.#sound.append(icon("soundOn"));
     this.#download.append(icon("download"));
@@ -104,6 +109,7 @@ export class Transport {
       live,
       iconButton("sameMoment", "Same moment on all cameras", () => actions.sameMoment(), "A"),
       keeping.root,
+      this.#snapshot,
       this.#download,
       iconButton("export", "Export a span of several cameras", () => actions.exportSpan(), "X"),
       iconButton("fullScreen", "Full screen", () => actions.fullScreen(), "F"),
@@ -134,12 +140,17 @@ export class Transport {
     this.#download.setAttribute("aria-disabled", String(!footage || !mayDownload));
     this.#download.setAttribute("aria-label", mayDownload ? kDownload : kMayNotDownload);
     this.#download.title = mayDownload ? kDownload : kMayNotDownload;
+    this.#snapshot.disabled = !footage || !mayDownload;
   }
 
   /** Of these cameras no recording can be downloaded from then on. */
   deny(denied: ReadonlySet<number>): void {
     this.#denied = denied;
     this.refresh();
+  }
+
+  isDenied(camera: number): boolean {
+    return this.#denied.has(camera);
   }
 
   #showSound(): void {

@@ -7,10 +7,10 @@ import { EventWalk, type Direction } from "../../playback/event_walk";
 import { kRates } from "../../playback/player_state";
 import { SyncPlayback } from "../../playback/sync_playback";
 import { Exports } from "../../wire/exports";
-import { isSameFootage, type Footage } from "../../wire/footage";
+import type { Footage } from "../../wire/footage";
 import { protocol } from "../../wire/protocol";
 import { Recordings, type EventCursor } from "../../wire/recordings";
-import { asServerError } from "../../wire/server";
+import { SnapshotDialog } from "../camera/snapshot_dialog";
 import { EventsJumps } from "../events/events_jumps";
 import { kEventsKeys, pressEventsKey, type EventsActions } from "../events/events_keys";
 import { EventsLayout } from "../events/events_layout";
@@ -19,6 +19,7 @@ import { KeepButton } from "../events/keep_button";
 import { tellNewEvents } from "../events/new_events";
 import { Overview } from "../events/overview";
 import { Scrubbing } from "../events/scrubbing";
+import { ShownAddress } from "../events/shown_address";
 import { Stage } from "../events/stage";
 import { StagePicker } from "../events/stage_picker";
 import { Transport } from "../events/transport";
@@ -28,7 +29,6 @@ import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { OncePerFrame } from "../widgets/once_per_frame";
 import { spanInWords } from "../widgets/text";
-import { parseEventsAddress, recordEventsAddress, type EventsAddress } from "./events_route";
 import { keepTrying } from "./keep_trying";
 import { showCamera } from "./route";
 import { Screen } from "./screen";
@@ -37,8 +37,6 @@ import type { Session } from "./session";
 const kRefreshMs = 250;
 const kReloadIntervalMs = 5_000;
 const kDaysIntervalMs = 300_000;
-/** Browsers refuse to change the address more often than a few times a second. */
-const kRecordMs = { standing: 500, playing: 1_000 };
 /** More are too small to see anything. */
 const kMaxPlayers = 9;
 
@@ -73,6 +71,8 @@ export class EventsScreen extends Screen {
   readonly #jumps: EventsJumps;
   readonly #transport: Transport;
   readonly #layout: EventsLayout;
+  readonly #address: ShownAddress;
+  readonly #snapshots = new SnapshotDialog(this.server);
   readonly #status = element("p", { class: "bar-status" });
   readonly #actions: EventsActions = {
     toggle: () => this.#togglePlaying(),
@@ -89,13 +89,9 @@ export class EventsScreen extends Screen {
     changeRate: (by) => this.#changeRate(by),
     exportSpan: () => this.#toggleExport(),
     sound: () => this.#toggleSound(),
+    snapshot: () => this.#takeSnapshot(),
     fullScreen: toggleFullScreen,
   };
-  /** Counts what the address has asked for; while it is being looked up, the address is not written. */
-  #followed = 0;
-  #isFollowing = false;
-  /** What is shown next is an entry of its own in the history. */
-  #isNewEntry = false;
   /** Why there is no list of cameras; empty when there is. */
   #error = "";
 
@@ -107,13 +103,15 @@ export class EventsScreen extends Screen {
     this.#stage = new Stage(this.#playback, maxPlayers, () => this.#showLanes());
     this.#picker = new StagePicker(maxPlayers, (layout) => this.#stage.setLayout(layout));
     this.#scrubbing = new Scrubbing(this.#recordings, this.#playback, this.#stage);
-    this.#jumps = new EventsJumps(this.#playback, this.#overview, this.#stage, this.#walk, () => this.#leaveMoment());
+    this.#jumps = new EventsJumps(this.#playback, this.#overview, this.#stage, this.#walk, () => this.#address.leave());
+    const shown = { recordings: this.#recordings, playback: this.#playback, overview: this.#overview };
+    this.#address = new ShownAddress({ ...shown, stage: this.#stage, jumps: this.#jumps });
     const changed = (footage: Footage) => this.#onKeepingChanged(footage);
     const keeping = new KeepButton(this.#recordings, this.#exports, session.account.is_manager, changed);
     this.#transport = new Transport(this.#playback, this.#walk, nameOf, keeping, this.#actions);
     this.#layout = new EventsLayout(this.#stage, this.#transport, this.#export, this.#overview);
     this.addToBar(this.#status, this.#picker.root);
-    this.front.append(this.#layout.root, keeping.dialog);
+    this.front.append(this.#layout.root, keeping.dialog, this.#snapshots.root);
     const onVisibility = () => this.#onVisibility();
     document.addEventListener("visibilitychange", onVisibility, { signal: this.closed });
     this.every(kRefreshMs, () => this.#refresh());
@@ -129,11 +127,12 @@ export class EventsScreen extends Screen {
     this.#scrubbing.close();
     this.#playback.close();
     this.#export.close();
+    this.#snapshots.root.close();
     this.#overview.close();
   }
 
   followRoute(): boolean {
-    void this.#openRoute();
+    void this.#address.follow();
     return true;
   }
 
@@ -182,36 +181,7 @@ export class EventsScreen extends Screen {
     const deny = (denied: ReadonlySet<number>) => [this.#transport, this.#export].forEach((one) => one.deny(denied));
     void this.#exports.denied().then(deny, ignore);
     this.#showLanes();
-    await this.#openRoute();
-  }
-
-  /** Opens what the address names, unless it is being shown. */
-  async #openRoute(): Promise<void> {
-    const address = parseEventsAddress(location.hash);
-    if (!address) return;
-    const followed = (this.#followed += 1);
-    this.#isFollowing = true;
-    try {
-      await this.#openAddress(address, () => followed === this.#followed);
-    } catch (error) {
-      notify(asServerError(error).message);
-    } finally {
-      if (followed === this.#followed) this.#isFollowing = false;
-    }
-  }
-
-  async #openAddress({ footage: wanted, atMs, isPlaying, stage, filter }: EventsAddress, isWanted: () => boolean): Promise<void> {
-    if (filter) this.#overview.follow(filter);
-    if (stage) this.#stage.show(stage.plan, stage.large);
-    // Back from what is being played ends it.
-    if (!wanted && atMs === null) return this.#playback.close();
-    if (!wanted) return this.#jumps.to(atMs!, isPlaying);
-    if (atMs === null && isSameFootage(wanted, this.#playback.active?.player.footage)) return;
-    const footage = await this.#recordings.find(wanted);
-    if (!isWanted()) return;
-    // An address that names a time leads to the picture of it.
-    if (footage) this.#jumps.show(footage, atMs === null, atMs ?? footage.start * 1000);
-    else notify("This recording no longer exists, or you do not have permission to view it.");
+    await this.#address.follow();
   }
 
   #seek(atMs: number, camera: number): void {
@@ -232,35 +202,24 @@ export class EventsScreen extends Screen {
     this.#transport.refresh();
     this.#overview.showPlayback(footage, this.#playback.playheadMs, this.#playback.isPlaying);
     this.#walk.refresh();
-    this.#recordShown();
-  }
-
-  /** So that Back returns to exactly the picture that is left. */
-  #leaveMoment(): void {
-    this.#recordShown(true);
-    this.#isNewEntry = true;
-  }
-
-  /** The address leads to what is shown, to the frame where a picture stands still. */
-  #recordShown(isAtOnce = false): void {
-    const { playheadMs, active, isPlaying, isScrubbed } = this.#playback;
-    if (playheadMs === null || isScrubbed || this.#isFollowing) return;
-    const { plan, large } = this.#stage;
-    const footage = active?.player.footage ?? null;
-    const address = { footage, atMs: playheadMs, isPlaying: false, stage: { plan, large }, filter: this.#overview.choice };
-    recordEventsAddress(address, this.#isNewEntry, isAtOnce ? 0 : isPlaying ? kRecordMs.playing : kRecordMs.standing);
-    this.#isNewEntry = false;
+    this.#address.record();
   }
 
   #refresh(): void {
     this.#playback.tick();
-    this.#recordShown();
+    this.#address.record();
     const { cache, cameras } = this.#overview;
     const error = this.#error || cache.error;
     const empty = cameras.length === 0 && this.progress.hidden ? "No cameras" : "";
     this.progress.hidden = !cache.isBusy && (cameras.length > 0 || error !== "");
     setText(this.#status, error || empty);
     this.#status.classList.toggle("alarm", error !== "");
+  }
+
+  #takeSnapshot(): void {
+    const { active } = this.#stage;
+    const taken = active === null || this.#transport.isDenied(active) ? null : this.#stage.snapshot();
+    if (taken) void this.#snapshots.take(taken.camera, () => taken.picture);
   }
 
   #toggleSound(): void {
@@ -294,7 +253,7 @@ export class EventsScreen extends Screen {
   /** To the live picture of the camera on the stage, or to the wall. */
   #goLive(): void {
     const [camera, another] = this.#stage.cameras;
-    this.#leaveMoment();
+    this.#address.leave();
     if (camera !== undefined && another === undefined) showCamera(camera);
     else location.hash = "#";
   }

@@ -3,7 +3,8 @@
 // Whether a key belongs to the control that has the focus, or is free for the screen's shortcuts.
 //
 // Why so        A click leaves the focus on what was clicked. Whoever then presses Space means the picture, not the
-//               button once more; whoever came to the button with Tab means the button.
+//               button once more; whoever came to the button with Tab means the button. A dialog gives the focus back to
+//               where it was, and that is then as it was.
 
 const kNoText = /^(checkbox|radio|button|submit|reset|range|color|file|image)$/;
 /** What works the controls that are no text fields. */
@@ -16,18 +17,36 @@ const kWorking: Record<string, RegExp> = {
 };
 
 let isPointerLast = false;
-let isFocusedByPointer = false;
-addEventListener("pointerdown", () => (isPointerLast = true), true);
-addEventListener("keydown", () => (isPointerLast = false), true);
-addEventListener("focusin", () => (isFocusedByPointer = isPointerLast), true);
+let wasInDialog = false;
+const focusedByPointer = new WeakSet<EventTarget>();
+
+function act(byPointer: boolean): void {
+  isPointerLast = byPointer;
+  wasInDialog = isInDialog(document.activeElement);
+}
+
+/** Firefox tells nothing of a focus that a dialog gives back. */
+function follow(focused: EventTarget): void {
+  if (wasInDialog && !isInDialog(focused)) return;
+  if (isPointerLast) focusedByPointer.add(focused);
+  else focusedByPointer.delete(focused);
+}
+
+function isInDialog(focused: EventTarget | null): boolean {
+  return focused instanceof Element && focused.closest("dialog") !== null;
+}
+
+addEventListener("pointerdown", () => act(true), true);
+addEventListener("keydown", () => act(false), true);
+addEventListener("focusin", ({ target }) => follow(target!), true);
 
 /** Whether it was a click or tap that brought the focus to where it is. */
 export function hasFocusByPointer(): boolean {
-  return isFocusedByPointer;
+  return document.activeElement !== null && focusedByPointer.has(document.activeElement);
 }
 
 export function isForFocused({ target, key }: KeyboardEvent): boolean {
   if (!(target instanceof HTMLElement)) return false;
   const isText = target instanceof HTMLInputElement ? !kNoText.test(target.type) : target instanceof HTMLTextAreaElement;
-  return isText || (!isFocusedByPointer && (kWorking[target.tagName]?.test(key) ?? false));
+  return isText || (!focusedByPointer.has(target) && (kWorking[target.tagName]?.test(key) ?? false));
 }
