@@ -92,7 +92,8 @@ export class Playback {
 
   /** After a stream from that frame on was lost, which lasted so long. */
   #isOver(from: number, ms: number): boolean {
-    const isSilent = this.#key !== 0 && this.#sink.shown.index === from && ms >= kMaxSilenceMs && !this.#opened.footage.isGrowing;
+    const isStill = this.#key !== 0 && this.#sink.shown.index === from;
+    const isSilent = isStill && ms >= kMaxSilenceMs && !this.#opened.footage.isGrowing;
     this.#silentStreams = isSilent ? this.#silentStreams + 1 : 0;
     return this.#silentStreams >= kMaxSilentStreams;
   }

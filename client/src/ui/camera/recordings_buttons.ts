@@ -6,7 +6,7 @@ import { iconButton } from "../widgets/button";
 
 const kRecentMs = 30_000;
 
-/** From a camera's live picture to what was recorded of it; none for a paired host's camera, whose recordings are there. */
+/** From a camera's live picture to what was recorded of it; none for a paired host's camera, which records there. */
 export function recordingsButtons({ id, name, server }: Camera): HTMLButtonElement[] {
   if (server) return [];
   const go = (atMs: number | null) => void (location.hash = cameraAddress(id, atMs));

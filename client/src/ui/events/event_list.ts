@@ -37,6 +37,13 @@ function foundLines(found: readonly (readonly string[])[]): (Node | string)[] {
   ]);
 }
 
+function textOf({ footage, ids }: EventRow): string {
+  if (footage.text) return footage.text.replaceAll("\n", " · ");
+  const kind = kindOf(footage);
+  if (kind !== "continuous") return kKindNames[kind];
+  return ids.length > 1 ? `${ids.length} recordings` : "";
+}
+
 export interface EventListActions {
   open(footage: Footage): void;
   /** Shows what other cameras have at the moment of the event. */
@@ -157,7 +164,7 @@ export class EventList {
   }
 
   #fill(row: HTMLElement, shown: EventRow, at: number, rowPx: number): void {
-    const { footage: one, ids, seconds, isGrowing } = shown;
+    const { footage: one, seconds, isGrowing } = shown;
     const [button, all] = [...row.children] as [HTMLButtonElement, HTMLButtonElement];
     const [swatch, time, name, text, side] = [...button.children] as [HTMLElement, HTMLElement, HTMLElement, HTMLElement, HTMLElement];
     const kind = kindOf(one);
@@ -168,7 +175,7 @@ export class EventList {
     setText(time, one.found ? minuteText(one.moment * 1000) : clockTime(one.moment * 1000));
     setText(name, this.#nameOf(one.camera));
     if (one.found) text.replaceChildren(...foundLines(one.found));
-    else setText(text, one.text ? one.text.replaceAll("\n", " · ") : kind === "continuous" ? (ids.length > 1 ? `${ids.length} recordings` : "") : kKindNames[kind]);
+    else setText(text, textOf(shown));
     setText(side, isGrowing ? "recording" : one.isSaved ? duration(seconds) : "no footage");
     side.classList.toggle("recording", isGrowing);
     button.querySelector<HTMLElement>(".row-kept")!.hidden = !one.isKept;

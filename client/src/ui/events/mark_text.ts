@@ -24,7 +24,7 @@ export class MarkText {
   }
 }
 
-/** Of marks, the one to show at a time: of those whose footage has it and that say something, that of the nearest moment. */
+/** The mark to show at a time: of those whose footage has it and that say something, that of the nearest moment. */
 export function markAt(footage: readonly Footage[], atS: number): Footage | null {
   const isTold = ({ kind, start, stop, text }: Footage) => kind !== "event" && start <= atS && atS <= stop && text !== "";
   const distance = ({ moment }: Footage) => Math.abs(moment - atS);
