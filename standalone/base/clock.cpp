@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/clock.h"
 
-#include <algorithm>
 #include <array>
 #include <cstdio>
+#include <cstdlib>
 #include <ctime>
-#include <utility>
 
 #include "standalone/base/file.h"
 
@@ -33,10 +32,15 @@ std::int64_t WallSeconds() {
     return WallMillis() / 1000;
 }
 
+std::string BootId() {
+    const char* told = std::getenv("LOOKHAVEN_BOOT_ID");
+    std::string boot = told != nullptr ? told : ReadFile("/proc/sys/kernel/random/boot_id");
+    std::erase_if(boot, [](char letter) { return letter == '-' || letter == '\n'; });
+    return boot;
+}
+
 BootTime TimeSinceBoot() {
-    std::string boot = ReadFile("/proc/sys/kernel/random/boot_id");
-    boot.erase(std::min(boot.find('\n'), boot.size()));
-    return {std::move(boot), Micros(CLOCK_BOOTTIME) / 1'000'000};
+    return {BootId(), Micros(CLOCK_BOOTTIME) / 1'000'000};
 }
 
 std::string FormatUtc(std::int64_t wall_millis) {

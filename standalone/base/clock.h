@@ -15,6 +15,10 @@ std::int64_t MonotonicMicros();
 std::int64_t WallMillis();
 std::int64_t WallSeconds();
 
+// 32 hexadecimal digits, the same for all processes of the machine until it boots. A container hides /proc's id
+// behind one of its own, but not in the /proc of a confined service: there LOOKHAVEN_BOOT_ID says it.
+std::string BootId();
+
 // Which nobody sets: seconds that include suspension, comparable within one boot, whose id goes along.
 struct BootTime {
     std::string boot;

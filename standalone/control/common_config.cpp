@@ -19,7 +19,7 @@ namespace lookhaven::control {
 // The file: the record, the boot of the machine that it belongs to, and the recorder that refreshes it.
 struct CommonConfigFile {
     CommonConfig config;
-    std::array<char, 36> boot;
+    std::array<char, 32> boot;
     base::ProcessIdentity recorder;
 };
 
@@ -31,9 +31,9 @@ std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "common-config";
 }
 
-std::array<char, 36> ThisBoot() {
-    std::array<char, 36> boot{};
-    base::ReadFile("/proc/sys/kernel/random/boot_id").copy(boot.data(), boot.size());
+std::array<char, 32> ThisBoot() {
+    std::array<char, 32> boot{};
+    base::BootId().copy(boot.data(), boot.size());
     return boot;
 }
 

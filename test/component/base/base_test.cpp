@@ -189,6 +189,17 @@ TEST(LogTest, TheJournalIsKnownByStandardErrorItself) {
     ::unsetenv("JOURNAL_STREAM");
 }
 
+TEST(ClockTest, ABootHasOneIdWhoeverTellsIt) {
+    const std::string boot = BootId();
+    EXPECT_EQ(boot.size(), 32U) << boot;
+    EXPECT_EQ(TimeSinceBoot().boot, boot);
+    ::setenv("LOOKHAVEN_BOOT_ID", boot.c_str(), 1);
+    EXPECT_EQ(BootId(), boot) << "as systemd tells it";
+    ::setenv("LOOKHAVEN_BOOT_ID", std::string(32, '0').c_str(), 1);
+    EXPECT_EQ(TimeSinceBoot().boot, std::string(32, '0')) << "whatever /proc says";
+    ::unsetenv("LOOKHAVEN_BOOT_ID");
+}
+
 TEST(ClockTest, DatesAreUtcWithMilliseconds) {
     EXPECT_EQ(FormatUtc(0), "1970-01-01T00:00:00.000Z");
     EXPECT_EQ(FormatUtc(951'827'696'007), "2000-02-29T12:34:56.007Z");

@@ -133,7 +133,7 @@ TEST_F(CommonConfigTest, ARecordOfAnEarlierBootIsReplacedSinceItsLockMayBeHeldFo
     { CommonConfigKeeper recorder(installation_); }
     std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
     file.seekp(sizeof(CommonConfig));
-    file << "00000000-0000-0000-0000-000000000000" << std::flush;
+    file << std::string(32, '0') << std::flush;
     EXPECT_EQ(MapCommonConfig(installation_), nullptr);
     CommonConfigKeeper recorder(installation_);
     EXPECT_NE(MapCommonConfig(installation_), nullptr);
