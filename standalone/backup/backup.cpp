@@ -10,6 +10,8 @@
 #include <stdexcept>
 #include <string_view>
 #include <system_error>
+#include <utility>
+#include <vector>
 
 #include <fcntl.h>
 #include <json/json.h>
@@ -95,6 +97,34 @@ std::optional<std::uintmax_t> MaxBytesOf(std::string_view name, const fs::path& 
     return std::nullopt;
 }
 
+// The folder's files that belong to a backup, if there is a folder.
+std::vector<fs::path> FilesOf(const std::string& folder, const fs::path& path) {
+    std::error_code error;
+    std::vector<fs::path> files;
+    for (const fs::directory_entry& file : fs::directory_iterator(path, error)) {
+        const std::string name = folder + "/" + file.path().filename().string();
+        if (fs::is_regular_file(file.symlink_status()) && MaxBytesOf(name, path)) {
+            files.push_back(file.path());
+        }
+    }
+    if (error && error != std::errc::no_such_file_or_directory) {
+        throw std::system_error(error, "cannot read " + path.string());
+    }
+    return files;
+}
+
+// As they belong together. Copied first, for whoever replaces them must not wait for where the backup goes.
+void CopyKeys(const base::Installation& installation, const WorkFolder& folder) {
+    const base::FileDescriptor lock = base::LockFile(installation.CertificateLockFile());
+    for (const auto& [name, path] : {std::pair{kCertificate, installation.TlsFolder()},
+                                     std::pair{kSigning, installation.SigningKeyFile().parent_path()}}) {
+        fs::create_directory(folder / name);
+        for (const fs::path& file : FilesOf(name, path)) {
+            fs::copy_file(file, folder / name / file.filename());
+        }
+    }
+}
+
 class BackupWriter {
   public:
     explicit BackupWriter(int descriptor) : tar_(descriptor) {}
@@ -107,21 +137,13 @@ class BackupWriter {
         file["sha256"] = digest.sha256;
     }
 
-    // The folder's files that belong to a backup, if there is a folder; returns how many there are.
+    // Returns how many there are.
     int AddFolder(const std::string& folder, const fs::path& path) {
-        std::error_code error;
-        int count = 0;
-        for (const fs::directory_entry& file : fs::directory_iterator(path, error)) {
-            const std::string name = folder + "/" + file.path().filename().string();
-            if (fs::is_regular_file(file.symlink_status()) && MaxBytesOf(name, path)) {
-                Add(name, file.path());
-                ++count;
-            }
+        const std::vector<fs::path> files = FilesOf(folder, path);
+        for (const fs::path& file : files) {
+            Add(folder + "/" + file.filename().string(), file);
         }
-        if (error && error != std::errc::no_such_file_or_directory) {
-            throw std::system_error(error, "cannot read " + path.string());
-        }
-        return count;
+        return static_cast<int>(files.size());
     }
 
     void Finish(const Summary& summary) {
@@ -219,9 +241,9 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     writer.Add(kRecords, records);
     summary.pictures = writer.AddFolder(kPictures, installation.Home() / kPictures);
     if (certificate == Certificate::kIncluded) {
-        const base::FileDescriptor pair = base::LockFile(installation.CertificateLockFile());
-        summary.has_certificate = writer.AddFolder(kCertificate, installation.TlsFolder()) > 0;
-        writer.AddFolder(kSigning, installation.SigningKeyFile().parent_path());
+        CopyKeys(installation, folder);
+        summary.has_certificate = writer.AddFolder(kCertificate, folder / kCertificate) > 0;
+        writer.AddFolder(kSigning, folder / kSigning);
     }
     writer.Finish(summary);
     return summary;
@@ -240,6 +262,7 @@ Summary Restore(const base::Installation& installation, int descriptor) {
     // First the pictures, which no map names yet: a map never lacks its picture.
     summary.pictures = MoveFiles(folder / kPictures, installation.Home() / kPictures);
     summary.records = CopyRecords(source, target, store::CopySessions::kNo);
+    const base::FileDescriptor lock = base::LockFile(installation.CertificateLockFile());
     summary.has_certificate = MoveFiles(folder / kCertificate, installation.TlsFolder()) > 0;
     MoveFiles(folder / kSigning, installation.SigningKeyFile().parent_path());
     return summary;
