@@ -22,6 +22,7 @@ namespace {
 
 struct Request {
     std::string admin;
+    bool ahead = false;
 };
 
 // What an attempt that was cut off has left.
@@ -108,7 +109,20 @@ void CopyOlderStore(const base::Installation& installation) {
     }
 }
 
+// While the older programs go on recording, who would have to wait for it.
+void CopyAhead(const Console& console) {
+    const base::Installation installation = console.Installation();
+    const bool copied =
+        store::Store::CopyIfOlder(installation.StoreUrl(), installation.Home(), store::Store::Copy::kAhead);
+    console.Answer(Object("copied", copied), copied ? "The store was copied: this version will change it."
+                                                    : "This version changes nothing in the store.");
+}
+
 void Init(const Console& console, const Request& request) {
+    if (request.ahead) {
+        CopyAhead(console);
+        return;
+    }
     console.BecomeOwner();
     const std::string& admin = request.admin;
     const base::Installation installation = CreateFolders(console.HomePath());
@@ -136,7 +150,9 @@ void Init(const Console& console, const Request& request) {
 void AddInit(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console);
     group.Add("init", "Creates the state folder, or upgrades an existing one", Init)
-        .Option("--admin", group.request().admin, "Also add this owner account; prompts for its password");
+        .Option("--admin", group.request().admin, "Also add this owner account; prompts for its password")
+        .Flag("--ahead", group.request().ahead,
+              "Only copy the store, where this version will change it, before the older one is stopped");
 }
 
 }  // namespace lookhaven::cli

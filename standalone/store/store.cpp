@@ -24,6 +24,7 @@ namespace {
 constexpr std::size_t kInstallationIdBytes = 16;
 constexpr int kLogAttempts = 100;
 constexpr std::chrono::milliseconds kLogAttemptPause{50};
+constexpr std::chrono::minutes kAheadMaxAge{15};
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
@@ -111,6 +112,30 @@ class PartialCopy {
     }
 };
 
+// Of a copy made ahead: it lacks what was stored since.
+bool IsRecent(const std::filesystem::path& copy) {
+    std::error_code none;
+    const auto made = std::filesystem::last_write_time(copy, none);
+    const auto now = std::filesystem::file_time_type::clock::now();
+    return !none && made <= now && now - made < kAheadMaxAge;
+}
+
+void MakeCopy(Connection& connection, int version, const std::filesystem::path& file) {
+    const PartialCopy copy(file.string() + ".new");
+    connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy.path); });
+    {
+        Connection copied({Engine::kSqlite, copy.path});
+        if (ReadVersion(copied) != version) {
+            throw StoreError("another program is upgrading it");
+        }
+        copied.Execute("delete from sessions");
+    }
+    if (::fsync(copy.file.Get()) != 0) {
+        base::ThrowErrno("cannot write " + copy.path);
+    }
+    std::filesystem::rename(copy.path, file);
+}
+
 int TakeSteps(const Connection& connection, soci::session& sql, int version) {
     if (version == 0) {
         sql << "create table schema_version (version integer not null)";
@@ -184,7 +209,7 @@ int Store::Migrate(const std::string& url) {
     });
 }
 
-bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder) try {
+bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder, Copy when) try {
     const StoreAddress address = StoreAddress::Parse(url);
     if (address.engine != Engine::kSqlite || !std::filesystem::exists(address.location)) {
         return false;
@@ -199,23 +224,17 @@ bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& fol
     if (version == 0 || version >= SchemaVersion()) {
         return false;
     }
-    if (std::filesystem::space(folder).available < 3 * std::filesystem::file_size(address.location)) {
-        throw StoreError("there is no room for it beside an upgrade");
-    }
     const std::filesystem::path file = folder / ("lookhaven.db.schema-" + std::to_string(version));
-    const PartialCopy copy(file.string() + ".new");
-    connection.Read([&](soci::session& sql) { sql << "vacuum into :copy", soci::use(copy.path); });
-    {
-        Connection copied({Engine::kSqlite, copy.path});
-        if (ReadVersion(copied) != version) {
-            throw StoreError("another program is upgrading it");
+    const std::filesystem::path ahead = file.string() + ".ahead";
+    if (when == Copy::kNow && IsRecent(ahead)) {
+        std::filesystem::rename(ahead, file);
+    } else {
+        std::filesystem::remove(ahead);
+        if (std::filesystem::space(folder).available < 3 * std::filesystem::file_size(address.location)) {
+            throw StoreError("there is no room for it beside an upgrade");
         }
-        copied.Execute("delete from sessions");
+        MakeCopy(connection, version, when == Copy::kAhead ? ahead : file);
     }
-    if (::fsync(copy.file.Get()) != 0) {
-        base::ThrowErrno("cannot write " + copy.path);
-    }
-    std::filesystem::rename(copy.path, file);
     if (::fsync(place.Get()) != 0) {
         base::ThrowErrno("cannot write " + folder.string());
     }

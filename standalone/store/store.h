@@ -79,9 +79,11 @@ class Store {
 
     // Copies a SQLite store that an older program made, without its sessions, to the private file
     // lookhaven.db.schema-<its version> in the folder, which it replaces: the way back to that program, after Migrate.
-    // False, with nothing done, for any other store: PostgreSQL's is its operator's to back up. Throws StoreError, also
-    // where Migrate would then lack room, and leaves the file as it was.
-    static bool CopyIfOlder(const std::string& url, const std::filesystem::path& folder);
+    // kAhead: while that program still runs, so that a call with kNow within a quarter of an hour has nothing to
+    // copy. False, with nothing done, for any other store: PostgreSQL's is its operator's to back up. Throws
+    // StoreError, also where Migrate would then lack room, and leaves the file as it was.
+    enum class Copy { kNow, kAhead };
+    static bool CopyIfOlder(const std::string& url, const std::filesystem::path& folder, Copy when = Copy::kNow);
 
     // The schema version this program needs.
     static int SchemaVersion();

@@ -94,6 +94,38 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
     EXPECT_EQ(Events(store).NextId(), 1);
 }
 
+TEST_P(EmptyStore, IsNotCopiedAgainSoonAfterItWasCopiedAhead) {
+    using Copy = Store::Copy;
+    const std::filesystem::path copy = folder_ / "lookhaven.db.schema-1";
+    const std::filesystem::path ahead = copy.string() + ".ahead";
+    for (const char* statement : Migrations().front().statements) {
+        Force(statement);
+    }
+    Force("create table schema_version (version integer not null)");
+    Force("insert into schema_version (version) values (1)");
+    Force("insert into settings (name, value) values ('count', '0')");
+    const bool is_copied = GetParam() == Engine::kSqlite;
+    const auto count_in_copy = [&] {
+        return Connection({Engine::kSqlite, copy.string()})
+            .FetchOne<std::string>("select value from settings where name = 'count'");
+    };
+    for (const auto& [age, expected] :
+         {std::pair{std::chrono::minutes(0), "1"}, {std::chrono::minutes(20), "2"}, {std::chrono::minutes(-20), "2"}}) {
+        Force("update settings set value = '1' where name = 'count'");
+        ASSERT_EQ(Store::CopyIfOlder(url_, folder_, Copy::kAhead), is_copied);
+        if (!is_copied) {
+            return;
+        }
+        EXPECT_FALSE(std::filesystem::exists(copy)) << "until the upgrade";
+        std::filesystem::last_write_time(ahead, std::filesystem::last_write_time(ahead) - age);
+        Force("update settings set value = '2' where name = 'count'");
+        EXPECT_TRUE(Store::CopyIfOlder(url_, folder_));
+        EXPECT_EQ(count_in_copy(), expected) << age.count();
+        EXPECT_FALSE(std::filesystem::exists(ahead));
+        std::filesystem::remove(copy);
+    }
+}
+
 TEST_P(EmptyStore, OfAVersionWithoutSearchInTextsFindsThoseOfItsMarks) {
     int version = 0;
     for (const Migration& migration : Migrations()) {
