@@ -34,7 +34,11 @@ SystemCallFilter::SystemCallFilter(DefaultAction action)
     if (!filter_) {
         throw std::bad_alloc();
     }
-    Check(::seccomp_attr_set(filter_.get(), SCMP_FLTATR_ACT_BADARCH, SCMP_ACT_KILL_PROCESS));
+    // Where it is not known, as in an emulator, it is the thread that ends.
+    if (const int result = ::seccomp_attr_set(filter_.get(), SCMP_FLTATR_ACT_BADARCH, SCMP_ACT_KILL_PROCESS);
+        result != -EINVAL) {
+        Check(result);
+    }
 }
 
 void SystemCallFilter::AddException(std::initializer_list<int> calls,
