@@ -58,9 +58,9 @@ FindEvent() {
         event=$(grep -oE '"id" ?: ?[0-9]+' "$work/events" | grep -oE '[0-9]+$' | head -n 1) && [[ $event ]]
 }
 
-# Decodes H.264 in a process that confines itself inside the service's own confinement.
+# A camera's recording. H.264 is decoded in a process that confines itself inside the service's own confinement.
 IsPlayed() {
-    FindEvent 2 && Shows "api=VEXO.Lookhaven.Player&method=PlayMjpegEvent&eventid=$event&timestamp=1&flushHeader=1"
+    FindEvent "$1" && Shows "api=VEXO.Lookhaven.Player&method=PlayMjpegEvent&eventid=$event&timestamp=1&flushHeader=1"
 }
 
 HasStill() {
