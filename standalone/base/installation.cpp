@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/base/installation.h"
 
+#include <charconv>
+#include <system_error>
+
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -11,6 +14,8 @@
 namespace lookhaven::base {
 
 namespace {
+
+constexpr const char* kHostFile = "host";
 
 // FNV-1a over device and inode: the same folder under two names is the same installation.
 std::uint64_t FolderId(const std::filesystem::path& folder) {
@@ -25,6 +30,12 @@ std::uint64_t FolderId(const std::filesystem::path& folder) {
         }
     }
     return hash;
+}
+
+void SyncFolder(const std::filesystem::path& folder) {
+    if (::fsync(OpenFile(folder, O_RDONLY | O_DIRECTORY).Get()) != 0) {
+        ThrowErrno("cannot write to " + folder.string());
+    }
 }
 
 }  // namespace
@@ -60,6 +71,31 @@ std::string Installation::StoreUrl() const {
     return DefaultStoreUrl();
 }
 
+int Installation::HostId() const {
+    const std::filesystem::path file = home_ / kHostFile;
+    if (!std::filesystem::exists(file)) {
+        return 0;
+    }
+    const std::string text = ReadFile(file);
+    int id = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), id);
+    if (error != std::errc() || id < 1 || std::string_view(end, text.data() + text.size()) != "\n") {
+        throw std::system_error(std::make_error_code(std::errc::invalid_argument),
+                                "the file " + file.string() + " does not hold the id of a host");
+    }
+    return id;
+}
+
+void Installation::SetHostId(int id) const {
+    const std::filesystem::path file = home_ / kHostFile;
+    if (id == 0) {
+        std::filesystem::remove(file);
+    } else {
+        WriteFileAtomically(file, std::to_string(id) + "\n");
+    }
+    SyncFolder(home_);
+}
+
 void Installation::SetStoreUrl(const std::string& url) const {
     const std::filesystem::path override_file = home_ / "store";
     if (url == DefaultStoreUrl()) {
@@ -68,9 +104,7 @@ void Installation::SetStoreUrl(const std::string& url) const {
         WriteFileAtomically(override_file, url + "\n");
     }
     // Else a power cut may bring the other store back.
-    if (::fsync(OpenFile(home_, O_RDONLY | O_DIRECTORY).Get()) != 0) {
-        ThrowErrno("cannot write to " + home_.string());
-    }
+    SyncFolder(home_);
 }
 
 }  // namespace lookhaven::base

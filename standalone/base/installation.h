@@ -38,6 +38,11 @@ class Installation {
     // From the next call of StoreUrl on; running programs keep the one they have. Throws std::system_error.
     void SetStoreUrl(const std::string& url) const;
 
+    // The id of this machine among the hosts that share its store (store/hosts.h), in the file "host" of the state
+    // folder; 0 where it was never added as one. Both throw std::system_error, HostId also where the file holds none.
+    int HostId() const;
+    void SetHostId(int id) const;  // 0: it is none any more
+
     // Tells installations of this machine apart; stable while the folder stays where it is.
     std::uint64_t Id() const { return id_; }
 

@@ -54,10 +54,11 @@ void RequireValid(const Camera& camera) {
 template <>
 struct Mapping<Camera> {
     static constexpr const char* kTable = "cameras";
-    static constexpr const char* kColumns = "id, name, enabled, video_type, live_profile, ptz, audio, insecure";
+    static constexpr const char* kColumns =
+        "id, name, enabled, video_type, live_profile, ptz, audio, insecure, host_id";
     static auto Members(auto& camera) {
         return std::tie(camera.id, camera.name, camera.enabled, camera.video_type, camera.live_profile, camera.ptz,
-                        camera.audio, camera.insecure);
+                        camera.audio, camera.insecure, camera.host_id);
     }
 };
 

@@ -35,6 +35,7 @@ struct Camera {
     bool audio = false;
     bool insecure = false;                // its HTTPS certificate is not verified
     std::vector<CameraProfile> profiles;  // by number, at least the live one
+    int host_id = 0;                      // the host of store/hosts.h that records it; 0: whichever has room
 
     // Null when the camera lacks that profile.
     const CameraProfile* FindProfile(int number) const;

@@ -20,7 +20,8 @@ namespace lookhaven::store {
 namespace {
 
 // What belongs to the place and not to the records.
-constexpr std::array<std::string_view, 3> kNotCopied = {"schema_version", "recorder_lease", "login_attempts"};
+constexpr std::array<std::string_view, 4> kNotCopied = {"schema_version", "recorder_lease", "camera_leases",
+                                                        "login_attempts"};
 
 // PostgreSQL's client takes in all rows of an answer.
 constexpr const char* kOpenCursor = "declare copied no scroll cursor for select * from ";
@@ -216,6 +217,7 @@ std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
             for (const std::string& table : tables) {
                 rows += CopyTable(source.connection(), from, to, table);
             }
+            Execute(to, "update hosts set holder = ''");
             return rows;
         });
     });

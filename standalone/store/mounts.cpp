@@ -11,10 +11,10 @@ namespace lookhaven::store {
 template <>
 struct Mapping<Mount> {
     static constexpr const char* kTable = "mounts";
-    static constexpr const char* kColumns = "id, name, path, max_bytes, max_age, enabled, is_default";
+    static constexpr const char* kColumns = "id, name, path, max_bytes, max_age, enabled, is_default, host_id";
     static auto Members(auto& mount) {
         return std::tie(mount.id, mount.name, mount.path, mount.max_bytes, mount.max_age_s, mount.enabled,
-                        mount.is_default);
+                        mount.is_default, mount.host_id);
     }
 };
 
@@ -41,6 +41,15 @@ bool IsInside(const std::string& inner, const std::string& outer) {
     return (inner + "/").starts_with(outer + "/");
 }
 
+// Whether one machine may have both.
+bool MayMeet(const Mount& one, const Mount& other) {
+    return one.host_id == other.host_id || one.host_id == 0 || other.host_id == 0;
+}
+
+bool HasMounts(soci::session& sql, int host) {
+    return Exists(sql, "select id from mounts where host_id = :host", host);
+}
+
 void RequireValid(soci::session& sql, const Mount& mount) {
     RequireFreeName(sql, "mounts", "a mount", mount.id, mount.name);
     if (!IsFolderPath(mount.path)) {
@@ -50,7 +59,8 @@ void RequireValid(soci::session& sql, const Mount& mount) {
         throw InvalidRecord("a mount's limits are not below 0");
     }
     for (const Mount& other : FetchMounts(sql)) {
-        if (other.id != mount.id && (IsInside(mount.path, other.path) || IsInside(other.path, mount.path))) {
+        if (other.id != mount.id && MayMeet(other, mount) &&
+            (IsInside(mount.path, other.path) || IsInside(other.path, mount.path))) {
             throw AlreadyExists("the mount \"" + other.name + "\" at " + other.path + " and " + mount.path +
                                 " would lie inside each other");
         }
@@ -59,7 +69,7 @@ void RequireValid(soci::session& sql, const Mount& mount) {
 
 void KeepOneDefault(soci::session& sql, const Mount& mount) {
     if (mount.is_default) {
-        Execute(sql, "update mounts set is_default = 0 where id <> :id", mount.id);
+        Execute(sql, "update mounts set is_default = 0 where id <> :id and host_id = :host", mount.id, mount.host_id);
     }
 }
 
@@ -71,7 +81,8 @@ void RequireFree(soci::session& sql, const Mount& mount) {
     if (CountRows(sql, "recording_plans", mount.id) > 0) {
         throw InvalidRecord("cameras record to the mount \"" + mount.name + "\": give them another one first");
     }
-    if (mount.is_default && FetchMounts(sql).size() > 1) {
+    if (mount.is_default &&
+        Exists(sql, "select id from mounts where host_id = :host and id <> :id", mount.host_id, mount.id)) {
         throw InvalidRecord("the mount \"" + mount.name + "\" is the default: make another one the default first");
     }
 }
@@ -93,7 +104,7 @@ int Mounts::Add(const Mount& mount) {
         Mount added = mount;
         added.id = NextId(sql, "mount");
         RaiseRevision(sql);
-        added.is_default = added.is_default || FetchMounts(sql).empty();
+        added.is_default = added.is_default || !HasMounts(sql, added.host_id);
         RequireValid(sql, added);
         KeepOneDefault(sql, added);
         Insert(sql, added);
@@ -105,10 +116,17 @@ void Mounts::Update(const Mount& mount) {
     connection_.Write([&](soci::session& sql) {
         RaiseRevision(sql);
         Mount changed = mount;
-        changed.is_default = RequireMount(sql, mount.id).is_default || changed.is_default;
+        const Mount before = RequireMount(sql, mount.id);
+        changed.is_default =
+            before.host_id == mount.host_id ? before.is_default || mount.is_default : !HasMounts(sql, mount.host_id);
         RequireValid(sql, changed);
         KeepOneDefault(sql, changed);
         store::Update(sql, changed);
+        if (before.is_default && before.host_id != mount.host_id) {
+            Execute(sql,
+                    "update mounts set is_default = 1 where id = (select min(id) from mounts where host_id = :host)",
+                    before.host_id);
+        }
     });
 }
 
@@ -150,7 +168,7 @@ std::optional<Mount> Mounts::Find(int id) {
 }
 
 std::optional<Mount> Mounts::FindForPlan(int id) {
-    return id != 0 ? Find(id) : connection_.FetchOne<Mount>("where is_default = 1");
+    return id != 0 ? Find(id) : connection_.FetchOne<Mount>("where is_default = 1 order by host_id limit 1");
 }
 
 std::vector<Mount> Mounts::List() {

@@ -15,15 +15,16 @@ namespace lookhaven::store {
 struct Mount {
     int id = 0;                  // from 1, never used twice, since events carry it
     std::string name;            // UTF-8, 1 to 64 bytes, no other mount's
-    std::string path;            // absolute; no mount lies inside another
+    std::string path;            // absolute; no mount lies inside another of the same host
     std::int64_t max_bytes = 0;  // retention keeps below this; 0: no limit but the disk's
     std::int64_t max_age_s = 0;  // retention removes what is older; 0: no limit
     bool enabled = true;         // recordings are written to it; those on it can be played either way
     bool is_default = false;     // where cameras record that name no mount
+    int host_id = 0;             // the host that has it; 0: the only one, or every host of store/hosts.h shares it
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) While there are mounts, exactly one is the default.
+//               (2) While a host has mounts, exactly one of them is its default; likewise of the shared ones.
 class Mounts {
   public:
     // The store must outlive this object.
@@ -32,7 +33,8 @@ class Mounts {
     // Stores the record under a new id, which it returns; the first mount becomes the default. Does not look at the
     // folder. Throws InvalidRecord or AlreadyExists.
     int Add(const Mount& mount);
-    // Replaces the record of mount.id; is_default can be set, not cleared. Throws InvalidRecord or NotFound.
+    // Replaces the record of mount.id; is_default can be set, not cleared. With another host it is the default of that
+    // one only where that one had no mount. Throws InvalidRecord or NotFound.
     void Update(const Mount& mount);
     // Removes the record; the files stay. forget_events: removes the mount's events and saved marks first, in several
     // transactions, so that some may be gone when it throws StoreError; call it again. Throws NotFound; InvalidRecord

@@ -10,8 +10,6 @@ namespace lookhaven::store {
 
 template <>
 struct Mapping<LeaseState> {
-    static constexpr const char* kTable = "recorder_lease";
-    static constexpr const char* kColumns = "count, holder, first_reserved_id";
     static auto Members(auto& state) { return std::tie(state.count, state.holder, state.first_reserved_id); }
 };
 
@@ -19,17 +17,30 @@ std::string RecorderName(const base::Installation& installation) {
     return installation.Home().string() + " on " + base::OwnHostName();
 }
 
+RecorderLease::RecorderLease(Store& store, int host) : connection_(store.connection()), host_(host) {}
+
 LeaseState RecorderLease::Current() {
-    return connection_.FetchOne<LeaseState>("").value_or(LeaseState{});
+    const char* columns = "select count, holder, first_reserved_id from recorder_lease";
+    const std::optional<LeaseState> state =
+        host_ == 0 ? connection_.FetchOne<LeaseState>(columns)
+                   : connection_.FetchOne<LeaseState>(
+                         "select heartbeat, holder, first_reserved_id from hosts where id = :host", host_);
+    return state.value_or(LeaseState{});
 }
 
 bool RecorderLease::Take(std::int64_t count, const std::string& holder, int first_reserved_id) {
     return connection_.Write(
         [&](soci::session& sql) {
-            return Execute(sql,
-                           "update recorder_lease set count = count + 1, holder = :holder, first_reserved_id = :first"
-                           " where count = :count",
-                           holder, first_reserved_id, count) > 0;
+            const int taken = host_ == 0
+                                  ? Execute(sql,
+                                            "update recorder_lease set count = count + 1, holder = :holder,"
+                                            " first_reserved_id = :first where count = :count",
+                                            holder, first_reserved_id, count)
+                                  : Execute(sql,
+                                            "update hosts set heartbeat = heartbeat + 1, holder = :holder,"
+                                            " first_reserved_id = :first where heartbeat = :count and id = :host",
+                                            holder, first_reserved_id, count, host_);
+            return taken > 0;
         },
         Durability::kLazy);
 }
@@ -37,10 +48,17 @@ bool RecorderLease::Take(std::int64_t count, const std::string& holder, int firs
 void RecorderLease::Release(std::int64_t count, const std::string& holder) {
     connection_.Write(
         [&](soci::session& sql) {
-            Execute(sql,
-                    "update recorder_lease set count = count + 1, holder = ''"
-                    " where count = :count and holder = :holder",
-                    count, holder);
+            if (host_ == 0) {
+                Execute(sql,
+                        "update recorder_lease set count = count + 1, holder = ''"
+                        " where count = :count and holder = :holder",
+                        count, holder);
+            } else {
+                Execute(sql,
+                        "update hosts set heartbeat = heartbeat + 1, holder = ''"
+                        " where heartbeat = :count and holder = :holder and id = :host",
+                        count, holder, host_);
+            }
         },
         Durability::kLazy);
 }

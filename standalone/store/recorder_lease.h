@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever hosts share the
-// store.
+// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever machines reach the
+// store. Where hosts share the store (hosts.h), each has a lease, for its own recorder.
 //
 // Why so        Two recorders on one store would record every camera twice. The clocks of two hosts cannot be compared,
 //               so the holder counts up, and others take the lease over once the count has not changed for a while by
@@ -30,9 +30,10 @@ std::string RecorderName(const base::Installation& installation);
 
 class RecorderLease {
   public:
-    // The store must outlive this object.
-    explicit RecorderLease(Store& store) : connection_(store.connection()) {}
+    // host: whose lease; 0: the only one, of a store without hosts. The store must outlive this object.
+    explicit RecorderLease(Store& store, int host = 0);
 
+    // That nobody has, for an unknown host; such a lease cannot be taken.
     LeaseState Current();
     // Takes or renews the lease if its count is still that one. False when somebody else was faster.
     bool Take(std::int64_t count, const std::string& holder, int first_reserved_id);
@@ -42,6 +43,7 @@ class RecorderLease {
 
   private:
     Connection& connection_;
+    const int host_;
 };
 
 }  // namespace lookhaven::store

@@ -42,14 +42,7 @@ struct Mapping<ServerDenial> {
 namespace {
 
 constexpr std::size_t kMaxCameraNameBytes = 255;
-constexpr std::size_t kMaxCertificateBytes = 32'768;  // as much as its web server is given with
 constexpr std::size_t kSecretDigits = 64;
-
-// Looks at the first and the last line; what stands between them is for the TLS library to judge.
-bool IsCertificate(std::string_view text) {
-    return text.size() <= kMaxCertificateBytes && text.starts_with("-----BEGIN CERTIFICATE-----\n") &&
-           text.ends_with("-----END CERTIFICATE-----\n");
-}
 
 void RequireValid(soci::session& sql, const RecordingServer& server) {
     if (server.address.empty() ? server.port != 0

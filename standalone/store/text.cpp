@@ -15,6 +15,7 @@ namespace {
 constexpr std::string_view kReservedName = "Lookhaven";
 constexpr std::size_t kMaxNameBytes = 64;
 constexpr std::size_t kMaxSourceBytes = 2048;
+constexpr std::size_t kMaxCertificateBytes = 32'768;
 
 bool IsAsciiLetterOrDigit(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9');
@@ -61,6 +62,11 @@ bool IsSource(std::string_view source) {
     // Without a host it is a file's path, which may hold spaces.
     return rest.size() > 2 && host.find('@') == host.npos &&
            (host.empty() || source.find_first_of(" \\") == source.npos);
+}
+
+bool IsCertificate(std::string_view text) {
+    return text.size() <= kMaxCertificateBytes && text.starts_with("-----BEGIN CERTIFICATE-----\n") &&
+           text.ends_with("-----END CERTIFICATE-----\n");
 }
 
 }  // namespace lookhaven::store

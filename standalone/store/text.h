@@ -20,4 +20,8 @@ bool IsReservedName(std::string_view name);
 // The form of a stream's address: "<scheme>:<rest>", without account and password before its host. Any scheme will do.
 bool IsSource(std::string_view source);
 
+// PEM of at most 32,768 bytes, as much as a web server is given with: its first and its last line; what stands between
+// them is for the TLS library to judge.
+bool IsCertificate(std::string_view text);
+
 }  // namespace lookhaven::store

@@ -120,6 +120,21 @@ TEST_F(FileTest, TwoMappingsOfOneFileAreTheSameMemory) {
     EXPECT_THROW(SharedMapping(path_ / "link", 4096), std::system_error);
 }
 
+TEST_F(FileTest, WhichHostAnInstallationIsIsReadAsWrittenOrNotAtAll) {
+    Installation::CreateFolders(path_ / "home");
+    const Installation installation(path_ / "home");
+    EXPECT_EQ(installation.HostId(), 0);
+    installation.SetHostId(12);
+    EXPECT_EQ(installation.HostId(), 12);
+    for (const char* text : {"", "\n", "0\n", "-1\n", "12", "12 \n", "x\n", "99999999999\n"}) {
+        WriteFileAtomically(path_ / "home" / "host", text);
+        EXPECT_THROW(installation.HostId(), std::system_error) << text;
+    }
+    installation.SetHostId(0);
+    EXPECT_EQ(installation.HostId(), 0);
+    installation.SetHostId(0);
+}
+
 TEST_F(FileTest, OneStateFolderIsOneInstallationUnderAnyName) {
     Installation::CreateFolders(path_ / "home");
     std::filesystem::create_directory_symlink(path_ / "home", path_ / "alias");

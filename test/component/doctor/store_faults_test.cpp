@@ -26,7 +26,11 @@ TEST_F(DoctorTest, FaultsOfFolderAndStoreAreFoundAndMendedWithoutLoss) {
         // As before the last step in store/schema.cpp.
         {"older store",
          [&] {
-             Sql("drop table preferences")();
+             Sql("drop table hosts")();
+             Sql("drop table camera_leases")();
+             Sql("delete from counters where name = 'host'")();
+             Sql("alter table cameras drop column host_id")();
+             Sql("alter table mounts drop column host_id")();
              Sql("update schema_version set version = version - 1")();
          },
          "do: lookhaven init"},

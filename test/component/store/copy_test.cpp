@@ -7,7 +7,9 @@
 #include "standalone/store/emaps.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
+#include "standalone/store/hosts.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/mounts.h"
 #include "standalone/store/preferences.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/sessions.h"
@@ -18,6 +20,7 @@
 namespace lookhaven::store {
 namespace {
 
+using testing::Each;
 using testing::ElementsAre;
 
 class CopyTest : public StoreTest {
@@ -43,6 +46,15 @@ class CopyTest : public StoreTest {
         Events(store_).AddAll(events);
         Marks(store_).Add(MarkKind::kPos, 1, 100, 0, "2 Tea");
         RecorderLease(store_).Take(0, "elsewhere", 7);
+        for (const char* name : {"nvr1", "nvr2"}) {
+            const int host =
+                Hosts(store_).Add({.name = name,
+                                   .address = "nvr",
+                                   .port = 8443,
+                                   .certificate = "-----BEGIN CERTIFICATE-----\nMII=\n-----END CERTIFICATE-----\n"});
+            Mounts(store_).Add({.name = name, .path = "/srv/footage", .host_id = host});
+            RecorderLease(store_, host).Take(0, "elsewhere", 7);
+        }
     }
 
     static constexpr int kEvents = 1'100;  // more than one fetch of a cursor
@@ -67,6 +79,9 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));
         EXPECT_EQ(Marks(copy).List({.camera_ids = {1}, .words = TextQuery("tea")}).size(), 1U);
         EXPECT_EQ(RecorderLease(copy).Current().holder, "") << "whoever held it records into the other store";
+        EXPECT_EQ(RecorderLease(copy, 2).Current().holder, "") << "likewise";
+        EXPECT_THAT(Hosts(copy).All(), testing::SizeIs(2));
+        EXPECT_THAT(Mounts(copy).List(), Each(testing::Field(&Mount::path, "/srv/footage")));
         EXPECT_THAT(copy.Check(), testing::IsEmpty());
         EXPECT_THROW(CopyRecords(store_, copy, CopySessions::kYes), InvalidRecord) << "it has records to lose now";
         EXPECT_EQ(Cameras(copy).Add({.name = "Yard", .profiles = {{.source = "test:mjpeg"}}}), 3);

@@ -1,0 +1,140 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Hosts that share a store: their records, what is theirs, and the lease of each one's recorder.
+#include "standalone/store/hosts.h"
+
+#include <utility>
+
+#include "standalone/store/mounts.h"
+#include "standalone/store/recorder_lease.h"
+#include "standalone/store/settings.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+using testing::Field;
+
+constexpr const char* kCertificate = "-----BEGIN CERTIFICATE-----\nMII=\n-----END CERTIFICATE-----\n";
+
+class HostTest : public StoreTest {
+  protected:
+    static Host Named(const std::string& name) {
+        return {.name = name, .address = name + ".example", .port = 443, .certificate = kCertificate, .version = "1"};
+    }
+    int AddMount(const std::string& name, const std::string& path, int host, bool is_default = false) {
+        return mounts_.Add({.name = name, .path = path, .is_default = is_default, .host_id = host});
+    }
+
+    Hosts hosts_{store_};
+    Mounts mounts_{store_};
+};
+
+TEST_P(HostTest, TheFirstOneGetsTheMountsThatThereAre) {
+    const int old = mounts_.Add({.name = "old", .path = "/srv/a"});
+    EXPECT_EQ(hosts_.HostOfMount(old), 0);
+    const std::int64_t before = Settings(store_).Revision();
+    const int first = hosts_.Add(Named("nvr1"));
+    EXPECT_GT(Settings(store_).Revision(), before);
+    const int shared = AddMount("shared", "/srv/shared", 0);
+    const int second = hosts_.Add(Named("nvr2"));
+    EXPECT_EQ(hosts_.HostOfMount(old), first);
+    EXPECT_EQ(hosts_.HostOfMount(shared), 0) << "only the first host finds mounts of a single machine";
+    hosts_.Remove(second);
+    EXPECT_EQ(hosts_.FindByName("nvr1"), hosts_.Find(first));
+    EXPECT_FALSE(hosts_.Find(second));
+    EXPECT_GT(hosts_.Add(Named("nvr2")), second) << "an id is never used again, since mounts carry it";
+}
+
+TEST_P(HostTest, RecordsThatBreakARuleAreRefused) {
+    hosts_.Add(Named("nvr1"));
+    const int id = hosts_.Add(Named("nvr3"));
+    const Host good = Named("nvr2");
+    const std::pair<const char*, Host> refused[] = {
+        {"the name of another", With(good, &Host::name, "nvr1")},
+        {"no name", With(good, &Host::name, "")},
+        {"no address", With(good, &Host::address, "")},
+        {"no host's name", With(good, &Host::address, "nvr 2/x")},
+        {"port 0", With(good, &Host::port, 0)},
+        {"no port", With(good, &Host::port, 65'536)},
+        {"no certificate", With(good, &Host::certificate, "")},
+        {"a version with a line break", With(good, &Host::version, "1\n2")},
+    };
+    for (const auto& [why, host] : refused) {
+        EXPECT_THROW(hosts_.Add(host), InvalidRecord) << why;
+        EXPECT_THROW(hosts_.Update(With(host, &Host::id, id)), InvalidRecord) << why;
+    }
+    EXPECT_THROW(hosts_.Update(With(good, &Host::id, 99)), NotFound);
+    EXPECT_THROW(hosts_.Remove(99), NotFound);
+    EXPECT_THAT(hosts_.All(), ElementsAre(Field(&Host::name, "nvr1"), Field(&Host::name, "nvr3")));
+}
+
+TEST_P(HostTest, ARecordersCountSurvivesAChangeOfTheRecord) {
+    Host host = Named("nvr1");
+    host.id = hosts_.Add(host);
+    hosts_.SetRoom(host.id, true);
+    ASSERT_TRUE(RecorderLease(store_, host.id).Take(0, "/var on nvr1", 7));
+    host.draining = true;
+    host.port = 8443;
+    hosts_.Update(host);
+    host.has_room = true;
+    host.heartbeat = 1;
+    host.recorder = "/var on nvr1";
+    EXPECT_EQ(hosts_.Find(host.id), host);
+}
+
+TEST_P(HostTest, EachHasALeaseForItsOwnRecorder) {
+    const int first = hosts_.Add(Named("nvr1"));
+    const int second = hosts_.Add(Named("nvr2"));
+    RecorderLease one(store_, first);
+    RecorderLease other(store_, second);
+    EXPECT_TRUE(one.Take(0, "a", 5));
+    EXPECT_FALSE(one.Take(0, "b", 9)) << "somebody was faster";
+    EXPECT_TRUE(other.Take(0, "b", 9));
+    EXPECT_EQ(one.Current(), (LeaseState{"a", 1, 5}));
+    EXPECT_EQ(RecorderLease(store_).Current().holder, "") << "that of a store without hosts";
+    one.Release(1, "a");
+    EXPECT_EQ(one.Current(), (LeaseState{"", 2, 5}));
+    EXPECT_EQ(other.Current(), (LeaseState{"b", 1, 9}));
+    EXPECT_FALSE(RecorderLease(store_, 99).Take(0, "c", 1)) << "there is no such host";
+}
+
+TEST_P(HostTest, MountsOfTwoHostsMayHaveOnePathAndEachHasADefault) {
+    const int first = hosts_.Add(Named("nvr1"));
+    const int second = hosts_.Add(Named("nvr2"));
+    const int one = AddMount("one", "/srv/a", first);
+    const int other = AddMount("other", "/srv/a", second);
+    const auto is_default = [this](int id) { return mounts_.Find(id)->is_default; };
+    EXPECT_TRUE(is_default(one) && is_default(other));
+    EXPECT_THROW(AddMount("inside", "/srv/a/b", second), AlreadyExists);
+    EXPECT_THROW(AddMount("shared", "/srv/a", 0), AlreadyExists) << "every host has it";
+    const int shared = AddMount("shared", "/srv/shared", 0);
+    EXPECT_THROW(AddMount("inside", "/srv/shared/b", first), AlreadyExists);
+    const int next = AddMount("next", "/srv/b", second, true);
+    EXPECT_TRUE(is_default(one) && !is_default(other) && is_default(next) && is_default(shared));
+    mounts_.Update(With(*mounts_.Find(next), &Mount::host_id, first));
+    EXPECT_TRUE(is_default(one) && is_default(other) && !is_default(next)) << "each still has one";
+    EXPECT_THROW(mounts_.Remove(one, true), InvalidRecord) << "the default, beside another";
+    mounts_.Remove(other, true);
+}
+
+TEST_P(HostTest, AHostThatCamerasWaitForIsNotRemoved) {
+    const int host = hosts_.Add(Named("nvr1"));
+    const int id = AddCamera();
+    EXPECT_EQ(hosts_.HostOfCamera(id), 0);
+    Cameras cameras(store_);
+    cameras.Update(With(*cameras.Find(id), &Camera::host_id, host));
+    EXPECT_THROW(hosts_.Remove(host), InvalidRecord);
+    Force("insert into camera_leases (camera_id, host_id, count, next_host_id) values (1, " + std::to_string(host) +
+          ", 1, 0)");
+    EXPECT_EQ(hosts_.HostOfCamera(id), host);
+    cameras.Update(With(*cameras.Find(id), &Camera::host_id, 0));
+    hosts_.Remove(host);
+    EXPECT_EQ(hosts_.HostOfCamera(id), 0);
+}
+
+LOOKHAVEN_ON_BOTH_ENGINES(HostTest);
+
+}  // namespace
+}  // namespace lookhaven::store
