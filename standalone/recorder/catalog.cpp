@@ -11,8 +11,8 @@ namespace lookhaven::recorder {
 
 namespace {
 
-CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::RecordingPlan>& plans,
-                  store::Mounts& mounts) {
+CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::RecordingPlan>& plans, store::Mounts& mounts,
+                  int host) {
     const auto found = plans.find(camera.id);
     const store::RecordingPlan plan = found == plans.end() ? store::NoPlan() : found->second;
     const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
@@ -27,7 +27,7 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
                       camera.live_profile,
                       camera.video_type,
                       plan.hours};
-    if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id); mount && mount->enabled) {
+    if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id, host); mount && mount->enabled) {
         result.mount_id = mount->id;
         result.mount = mount->path;
     }
@@ -36,8 +36,9 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
 
 }  // namespace
 
-Catalog::Catalog(const std::string& store_url, std::function<void()> on_change)
-    : on_change_(std::move(on_change)),
+Catalog::Catalog(const std::string& store_url, int host, std::function<void()> on_change)
+    : host_(host),
+      on_change_(std::move(on_change)),
       thread_(store_url, "read the cameras", [this](store::Store& store, const std::stop_token&) { Read(store); }) {}
 
 std::shared_ptr<const CatalogContents> Catalog::Current() const {
@@ -90,12 +91,14 @@ void Catalog::Read(store::Store& store) {
             }
             contents->streams.emplace(control::LiveStream{camera.id, profile.number}, std::move(plan));
         }
-        CameraPlan plan = PlanOf(camera, plans, mounts);
+        CameraPlan plan = PlanOf(camera, plans, mounts, host_);
         plan.installation = installation;
         contents->cameras.emplace(camera.id, std::move(plan));
     }
     for (const store::Mount& mount : mounts.List()) {
-        contents->mounts.emplace(mount.id, mount.enabled);
+        if (mount.IsOf(host_)) {
+            contents->mounts.emplace(mount.id, mount.enabled);
+        }
     }
     contents->is_read = true;
     revision_ = revision;

@@ -41,7 +41,7 @@ struct CameraPlan {
 struct CatalogContents {
     std::map<control::LiveStream, StreamPlan> streams;
     std::map<int, CameraPlan> cameras;  // by id
-    std::map<int, bool> mounts;         // by id; whether enabled
+    std::map<int, bool> mounts;         // of this host, by id; whether enabled
     bool is_read = false;               // false: the store has not been reached yet
 };
 
@@ -49,7 +49,8 @@ class Catalog {
   public:
     // Starts the thread, which reads at once and calls on_change, from that thread, whenever it found something new.
     // Throws std::system_error when no thread can be started.
-    Catalog(const std::string& store_url, std::function<void()> on_change);
+    // host: as in LeaseKeeper; the mounts are its own and shared ones.
+    Catalog(const std::string& store_url, int host, std::function<void()> on_change);
 
     // Has the store read again if its revision changed; does not wait.
     void Refresh() { thread_.Ask(); }
@@ -68,6 +69,7 @@ class Catalog {
     void Read(store::Store& store);
     void WriteVideoTypes(store::Store& store);
 
+    const int host_;
     const std::function<void()> on_change_;
     std::optional<std::int64_t> revision_;  // the thread's alone
     mutable std::mutex mutex_;

@@ -20,8 +20,8 @@ constexpr std::int64_t kMaxDelayS = 3;
 
 }  // namespace
 
-EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder)
-    : lease_(recorder, base::MonotonicMicros),
+EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder, int host, LeaseTimes times)
+    : lease_(recorder, base::MonotonicMicros, host, times),
       thread_(store_url, "store the events, recording goes on",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -70,6 +70,11 @@ void EventRowQueue::NoteWritten(int camera, std::int64_t until_s) {
 void EventRowQueue::NoteEnded(int camera) {
     const std::lock_guard lock(mutex_);
     written_until_s_.erase(camera);
+}
+
+bool EventRowQueue::HasUnstored(int camera) const {
+    const std::lock_guard lock(mutex_);
+    return std::ranges::any_of(entries_, [camera](const auto& entry) { return entry.second.row.camera_id == camera; });
 }
 
 bool EventRowQueue::HasStored(int camera, std::int64_t until_s) const {

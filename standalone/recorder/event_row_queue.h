@@ -26,9 +26,10 @@ namespace lookhaven::recorder {
 
 class EventRowQueue {
   public:
-    // Starts the thread. recorder: names this recorder to others on the same store. Throws std::system_error when no
-    // thread can be started.
-    explicit EventRowQueue(const std::string& store_url, const std::string& recorder = "this recorder");
+    // Starts the thread. recorder: names this recorder to others on the same store. host, times: as in LeaseKeeper.
+    // Throws std::system_error when no thread can be started.
+    explicit EventRowQueue(const std::string& store_url, const std::string& recorder = "this recorder", int host = 0,
+                           LeaseTimes times = {});
 
     // Another recorder records the cameras of this store: no event may begin here, and there are no ids for one.
     bool IsRefused() const { return is_refused_; }
@@ -46,6 +47,8 @@ class EventRowQueue {
     // The camera's recording: every row of a frame captured before until_s (UTC) has been Put; or it has ended.
     void NoteWritten(int camera, std::int64_t until_s);
     void NoteEnded(int camera);
+    // Whether a row of the camera has been Put that is not final in the store yet.
+    bool HasUnstored(int camera) const;
     // Whether all such rows are in the store; also for a camera that is not recorded.
     bool HasStored(int camera, std::int64_t until_s) const;
 

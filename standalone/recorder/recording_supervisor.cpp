@@ -2,6 +2,7 @@
 #include "standalone/recorder/recording_supervisor.h"
 
 #include <algorithm>
+#include <iterator>
 #include <utility>
 
 #include "standalone/base/clock.h"
@@ -12,8 +13,21 @@
 
 namespace lookhaven::recorder {
 
+namespace {
+
+// A heartbeat must be missed several times before its host counts as away.
+LeaseTimes TimesFor(std::chrono::microseconds host_away_limit) {
+    return {host_away_limit.count() / 6, host_away_limit.count() * 2 / 3};
+}
+
+// When no more footage of a mark can be expected from a camera that another host records now.
+constexpr std::int64_t kFootageElsewhereS = 900;
+
+}  // namespace
+
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
-                                         std::chrono::milliseconds no_data_limit)
+                                         std::chrono::milliseconds no_data_limit,
+                                         std::chrono::milliseconds host_away_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
@@ -21,11 +35,16 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
           maintenance::WriteRecordingStatus(installation, states.cameras);
           maintenance::WriteMountStatus(installation, states.mounts);
       }),
-      rows_(installation.StoreUrl(), store::RecorderName(installation)),
+      rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId(),
+            TimesFor(host_away_limit)),
+      hosts_(installation.HostId() == 0 ? nullptr
+                                        : std::make_unique<HostCameras>(
+                                              installation, rows_, std::chrono::microseconds(host_away_limit).count())),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
-                        maintenance::CompleteMarks(store, 0, base::WallSeconds(),
-                                                   [this](const store::Mark& mark) { return FootageHasEnded(mark); });
+                        maintenance::CompleteMarks(store, 0, base::WallSeconds(), [this](const store::Mark& mark) {
+                            return !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
+                        });
                     }) {
     try {
         for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
@@ -60,6 +79,7 @@ std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogCont
 void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     const std::size_t cameras = entries_.size();
     const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
+    const std::set<int> held = hosts_ ? hosts_->Held() : std::set<int>();
     std::map<int, CameraPlan> plans;
     for (const auto& [camera, plan] : catalog.cameras) {
         plans.emplace(camera, PlanAt(plan, base::WallSeconds()));
@@ -67,7 +87,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     std::erase_if(entries_,
                   [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
     const auto needs = [&](int camera, const CameraPlan& plan) {
-        return !rows_.IsRefused() &&
+        return !rows_.IsRefused() && (hosts_ == nullptr || held.contains(camera)) &&
                (plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera));
     };
     for (auto& [camera, entry] : entries_) {
@@ -95,6 +115,12 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
             request.plan.mount_id = 0;
         }
         entry->second.worker->SetRequest(request);
+    }
+    if (hosts_) {
+        std::set<int> recorded;
+        std::ranges::transform(entries_, std::inserter(recorded, recorded.end()),
+                               [](const auto& entry) { return entry.first; });
+        hosts_->NoteRecorded(std::move(recorded));
     }
     if (entries_.size() > cameras) {
         rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its id
@@ -156,6 +182,9 @@ RecordingSupervisor::CameraStates(const std::map<int, CameraSignal>& signals) {
 
 void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
+    if (hosts_) {
+        hosts_->Ask(HasRoom());
+    }
     missed_marks_.Ask();
     RecordingReport::States states{CameraStates(signals), {}};
     for (const auto& [id, mount] : mounts_) {
@@ -195,6 +224,9 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
 
 void RecordingSupervisor::RequestStop() {
     missed_marks_.RequestStop();
+    if (hosts_) {
+        hosts_->RequestStop();
+    }
     report_.RequestStop();
     for (const auto& [id, mount] : mounts_) {
         mount->RequestStop();
@@ -212,7 +244,7 @@ bool RecordingSupervisor::HasEnded() {
     if (!std::exchange(stores_last_rows_, true)) {
         rows_.RequestStop();
     }
-    return rows_.HasEnded() && missed_marks_.HasEnded() && report_.HasEnded() &&
+    return rows_.HasEnded() && (!hosts_ || hosts_->HasEnded()) && missed_marks_.HasEnded() && report_.HasEnded() &&
            std::ranges::all_of(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
 }
 
@@ -248,7 +280,22 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
     if (rows_.IsRefused() || !rows_.FirstReservedId()) {
         return false;  // another recorder has the footage
     }
+    if (IsHeldElsewhere(mark.camera_id) && base::WallSeconds() < mark.end_s + kFootageElsewhereS) {
+        return false;  // another host may record more of it
+    }
     return (are_mounts_recovered_ || mark.start_s > started_s_) && rows_.HasStored(mark.camera_id, mark.end_s);
+}
+
+bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
+    return hosts_ && hosts_->IsHeldElsewhere(camera);
+}
+
+bool RecordingSupervisor::HasRoom() const {
+    return std::ranges::any_of(mounts_, [](const auto& mount) {
+        const maintenance::MountState state = mount.second->Status().state;
+        return state != maintenance::MountState::kNotMounted && state != maintenance::MountState::kInUse &&
+               state != maintenance::MountState::kFailing;
+    });
 }
 
 // A thread that cannot be had costs that camera or mount alone, until it can. Logged once for each reason.

@@ -14,11 +14,15 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/control/stream_counters.h"
+#include "standalone/recorder/host_cameras.h"
 #include "standalone/recorder/mount_maintenance.h"
 #include "standalone/recorder/recording_report.h"
 #include "standalone/recorder/recording_worker.h"
 
 namespace lookhaven::recorder {
+
+// How long a host's heartbeat stands still until others take its cameras over.
+constexpr std::chrono::milliseconds kHostAwayLimit{30'000};
 
 // What comes from a camera: from the stream that is recorded, else from one that fails, if any does.
 struct CameraSignal {
@@ -29,8 +33,9 @@ struct CameraSignal {
 
 class RecordingSupervisor {
   public:
-    // The installation must outlive this object. Throws std::system_error.
-    RecordingSupervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit);
+    // host_away_limit: as in Supervisor. The installation must outlive this object. Throws std::system_error.
+    RecordingSupervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit,
+                        std::chrono::milliseconds host_away_limit = kHostAwayLimit);
 
     // Starts, changes and stops workers to match the catalog and the pending marks.
     void Reconcile(const CatalogContents& catalog);
@@ -59,8 +64,10 @@ class RecordingSupervisor {
     void StartRecording(const control::LiveStream& stream);
     void AnswerFlushes();
     void ReconcileMounts(const CatalogContents& catalog);
+    bool HasRoom() const;
     std::vector<maintenance::RecordingStatus> CameraStates(const std::map<int, CameraSignal>& signals);
     bool FootageHasEnded(const store::Mark& mark) const;
+    bool IsHeldElsewhere(int camera) const;
     template <class Work>
     void Start(const std::string& what, Work&& start);
 
@@ -69,6 +76,7 @@ class RecordingSupervisor {
     control::FlushRequests flush_requests_;
     RecordingReport report_;
     EventRowQueue rows_;
+    std::unique_ptr<HostCameras> hosts_;  // null on a single machine
     const std::int64_t started_s_ = base::WallSeconds();
     std::atomic<int> space_requests_ = 0;
     std::atomic<bool> are_mounts_recovered_ = false;

@@ -22,15 +22,15 @@ constexpr std::int64_t kStandstillUs = 3'000'000;
 }  // namespace
 
 Supervisor::Supervisor(const base::Installation& installation, media::SourceKinds kinds,
-                       std::chrono::milliseconds no_data_limit)
+                       std::chrono::milliseconds no_data_limit, std::chrono::milliseconds host_away_limit)
     : installation_(installation),
       kinds_(std::move(kinds)),
       no_data_limit_(no_data_limit),
       demand_(installation),
       common_config_(installation),
       counters_(installation),
-      catalog_(installation.StoreUrl(), [this] { demand_.Wake(); }),
-      recordings_(installation, no_data_limit) {
+      catalog_(installation.StoreUrl(), installation.HostId(), [this] { demand_.Wake(); }),
+      recordings_(installation, no_data_limit, host_away_limit) {
     DoEverySecond();
     Reconcile();  // viewers' requests may be older than this recorder
 }

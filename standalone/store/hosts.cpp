@@ -54,6 +54,7 @@ int Hosts::Add(const Host& host) {
                 std::numeric_limits<int>::max());
         if (is_first) {
             Execute(sql, "update mounts set host_id = :id where host_id = 0", added.id);
+            Execute(sql, "update recorder_lease set count = count + 1, holder = ''");
         }
         return added.id;
     });
@@ -83,9 +84,17 @@ void Hosts::Remove(int id) {
         if (Exists(sql, "select id from cameras where host_id = :id", id)) {
             throw InvalidRecord("cameras are fixed to this host: give them to another one, or to any, first");
         }
-        Execute(sql, "delete from camera_leases where host_id = :id", id);
+        Execute(sql, "update camera_leases set host_id = 0, count = count + 1 where host_id = :id", id);
         if (Execute(sql, "delete from hosts where id = :id", id) == 0) {
             ThrowNotFound("host", id);
+        }
+        if (!Exists(sql, "select id from hosts")) {
+            // One default alone.
+            Execute(sql,
+                    "update mounts set is_default = 0 where host_id = :id"
+                    " and exists (select 1 from mounts as shared where shared.host_id = 0)",
+                    id);
+            Execute(sql, "update mounts set host_id = 0 where host_id = :id", id);
         }
     });
 }

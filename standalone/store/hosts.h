@@ -46,8 +46,8 @@ class Hosts {
     void Update(const Host& host);
     // Raises no revision. Nothing happens for an unknown host, or when it is stored so.
     void SetRoom(int id, bool has_room);
-    // Removes the record and its leases; its mounts, with what lies on them, stay, and keep its id. Throws NotFound;
-    // InvalidRecord while cameras are fixed to it.
+    // Removes the record, and gives up its leases; its mounts, with what lies on them, stay, and keep its id. Those of
+    // the last host become a single machine's again. Throws NotFound; InvalidRecord while cameras are fixed to it.
     void Remove(int id);
 
     std::optional<Host> Find(int id);

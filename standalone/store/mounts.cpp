@@ -167,8 +167,15 @@ std::optional<Mount> Mounts::Find(int id) {
     return connection_.FetchOne<Mount>("where id = :id", id);
 }
 
-std::optional<Mount> Mounts::FindForPlan(int id) {
-    return id != 0 ? Find(id) : connection_.FetchOne<Mount>("where is_default = 1 order by host_id limit 1");
+std::optional<Mount> Mounts::FindForPlan(int id, int host) {
+    if (id != 0) {
+        std::optional<Mount> named = Find(id);
+        if (host == 0 || (named && named->IsOf(host))) {
+            return named;
+        }
+    }
+    return connection_.FetchOne<Mount>(
+        "where is_default = 1 and (host_id = :host or host_id = 0) order by host_id desc limit 1", host);
 }
 
 std::vector<Mount> Mounts::List() {

@@ -21,6 +21,9 @@ struct Mount {
     bool enabled = true;         // recordings are written to it; those on it can be played either way
     bool is_default = false;     // where cameras record that name no mount
     int host_id = 0;             // the host that has it; 0: the only one, or every host of store/hosts.h shares it
+
+    // Whether that host may have it, or the only machine for 0.
+    bool IsOf(int host) const { return host_id == 0 || host_id == host; }
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
@@ -49,8 +52,9 @@ class Mounts {
     void ReserveIds(int camera, int event);
 
     std::optional<Mount> Find(int id);
-    // The default for id 0.
-    std::optional<Mount> FindForPlan(int id);
+    // Where the host records a camera whose plan names that mount, or none for id 0: to that one where it has it, else
+    // to its default, or that of the shared ones where it has no mount of its own. host 0: a single machine.
+    std::optional<Mount> FindForPlan(int id, int host = 0);
     std::vector<Mount> List();  // by id
 
   private:

@@ -19,6 +19,14 @@ std::string RecorderName(const base::Installation& installation) {
 
 RecorderLease::RecorderLease(Store& store, int host) : connection_(store.connection()), host_(host) {}
 
+LeaseState AnyRecorder(Store& store) {
+    return store.connection()
+        .FetchOne<LeaseState>("select count, holder, first_reserved_id from recorder_lease where holder <> ''"
+                              " union select heartbeat, holder, first_reserved_id from hosts where holder <> ''"
+                              " order by 3 limit 1")
+        .value_or(LeaseState{});
+}
+
 LeaseState RecorderLease::Current() {
     const char* columns = "select count, holder, first_reserved_id from recorder_lease";
     const std::optional<LeaseState> state =

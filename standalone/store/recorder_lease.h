@@ -28,6 +28,9 @@ struct LeaseState {
 // The holder's name, "/var/lib/lookhaven on nvr1": the same after a restart, another on each host.
 std::string RecorderName(const base::Installation& installation);
 
+// What holds for all recorders of the store, those of hosts included: some holder, and the lowest reserved id.
+LeaseState AnyRecorder(Store& store);
+
 class RecorderLease {
   public:
     // host: whose lease; 0: the only one, of a store without hosts. The store must outlive this object.

@@ -20,16 +20,16 @@ TEST(LeaseKeeper, OneRecorderAtATimeHoldsAStore) {
     std::int64_t now_us = 0;
     LeaseKeeper first("A", [&] { return now_us; });
     LeaseKeeper second("B", [&] { return now_us; });
-    for (; now_us < 10 * LeaseKeeper::kExpiryUs; now_us += LeaseKeeper::kRenewUs) {
+    for (; now_us < 10 * LeaseTimes().expiry_us; now_us += LeaseTimes().renew_us) {
         EXPECT_TRUE(first.Hold(store, 1));
         EXPECT_FALSE(second.Hold(store, 1));
     }
     EXPECT_TRUE(LeaseKeeper("A", [&] { return now_us; }).Hold(store, 7)) << "started again";
     EXPECT_EQ(store::RecorderLease(store).Current().first_reserved_id, 7);
-    now_us += LeaseKeeper::kRenewUs;
+    now_us += LeaseTimes().renew_us;
     EXPECT_FALSE(first.Hold(store, 1));
     EXPECT_FALSE(second.Hold(store, 1));
-    now_us += LeaseKeeper::kExpiryUs;
+    now_us += LeaseTimes().expiry_us;
     EXPECT_TRUE(second.Hold(store, 1)) << "nobody renews it";
     first.Release(store);
     EXPECT_FALSE(first.Hold(store, 1)) << "what it has lost it cannot give back";

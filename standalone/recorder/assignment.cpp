@@ -1,0 +1,111 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/assignment.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace lookhaven::recorder {
+
+namespace {
+
+// Without the store for a longer part of the time until a host counts as away, and the watch begins anew.
+constexpr std::int64_t kMaxGapPart = 3;
+
+class Sharing {
+  public:
+    Sharing(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+        for (const AssignedHost& host : hosts) {
+            hosts_.emplace(host.id, host);
+            cameras_[host.id] = 0;
+        }
+        for (const store::CameraLease& camera : cameras) {
+            if (camera.enabled && !IsFree(camera)) {
+                ++cameras_[camera.host_id];
+            }
+        }
+    }
+
+    bool IsThere(int host) const { return hosts_.contains(host) && hosts_.at(host).is_there; }
+    bool Runs(int host) const { return hosts_.contains(host) && hosts_.at(host).runs; }
+    bool Takes(int host) const { return hosts_.contains(host) && hosts_.at(host).takes; }
+    bool AnotherTakes(int host) const {
+        return std::ranges::any_of(hosts_,
+                                   [host](const auto& entry) { return entry.first != host && entry.second.takes; });
+    }
+
+    // Nobody has it, or who has it is away.
+    bool IsFree(const store::CameraLease& camera) const { return !IsThere(camera.host_id); }
+
+    bool MustGive(int own, const store::CameraLease& camera) const {
+        if (!camera.enabled) {
+            return true;
+        }
+        if (camera.fixed_host_id != 0) {
+            return camera.fixed_host_id != own && Runs(camera.fixed_host_id);
+        }
+        if (camera.next_host_id != 0 && camera.next_host_id != own && Takes(camera.next_host_id)) {
+            return true;
+        }
+        return !Takes(own) && AnotherTakes(own);
+    }
+
+    // Who takes a camera that is free; 0 for nobody. It counts as that host's from then on.
+    int Taker(const store::CameraLease& camera) {
+        int taker = 0;
+        if (camera.fixed_host_id != 0) {
+            taker = Runs(camera.fixed_host_id) ? camera.fixed_host_id : 0;
+        } else if (Takes(camera.next_host_id)) {
+            taker = camera.next_host_id;
+        } else {
+            for (const auto& [id, host] : hosts_) {
+                if (host.takes && (taker == 0 || cameras_.at(id) < cameras_.at(taker))) {
+                    taker = id;
+                }
+            }
+        }
+        if (taker != 0) {
+            ++cameras_[taker];
+        }
+        return taker;
+    }
+
+  private:
+    std::map<int, AssignedHost> hosts_;
+    std::map<int, int> cameras_;  // by host
+};
+
+}  // namespace
+
+void HostWatch::Observe(const std::vector<store::Host>& hosts, std::int64_t now_us) {
+    const bool is_gap = now_us - observed_us_ > away_us_ / kMaxGapPart;
+    observed_us_ = now_us;
+    std::map<int, Heartbeat> seen;
+    for (const store::Host& host : hosts) {
+        const auto known = heartbeats_.find(host.id);
+        const bool stands_still = known != heartbeats_.end() && known->second.count == host.heartbeat;
+        seen[host.id] = {host.heartbeat, stands_still && !is_gap ? known->second.changed_us : now_us};
+    }
+    heartbeats_ = std::move(seen);
+}
+
+bool HostWatch::IsThere(int host) const {
+    const auto known = heartbeats_.find(host);
+    return known != heartbeats_.end() && observed_us_ - known->second.changed_us < away_us_;
+}
+
+Assignment Assign(int own, const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+    Sharing sharing(hosts, cameras);
+    Assignment assignment;
+    for (const store::CameraLease& camera : cameras) {
+        if (camera.host_id == own) {
+            if (sharing.MustGive(own, camera)) {
+                assignment.give.push_back(camera.camera_id);
+            }
+        } else if (camera.enabled && sharing.IsFree(camera) && sharing.Taker(camera) == own) {
+            assignment.take.push_back(camera);
+        }
+    }
+    return assignment;
+}
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which cameras a host takes and gives away, decided by each host for itself from what all of them see.
+//
+// Why so        There is no host that decides for the others, and so none to lose. Every host shares the free cameras
+//               out among all hosts in the same way, and takes its own part; where two see the store a moment apart, the
+//               lease goes to one of them (store/camera_leases.h).
+// Invariants    (1) A camera that is fixed to a host is taken by that host alone.
+//               (2) Nothing is given away that nobody is there to take: recording by the wrong host is better than none.
+//               (3) A floating camera moves when its holder is away, drains, or an owner moved it, and never otherwise.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <vector>
+
+#include "standalone/store/camera_leases.h"
+#include "standalone/store/hosts.h"
+
+namespace lookhaven::recorder {
+
+// Which hosts are away, by this process's own clock.
+//
+// Why so        While the store is away from everybody no heartbeat changes, and the one that reaches it first
+//               afterwards must not take everybody else for silent. So only time through which this process itself saw
+//               the store counts.
+class HostWatch {
+  public:
+    // away_us: how long a heartbeat stands still until its host counts as away.
+    explicit HostWatch(std::int64_t away_us) : away_us_(away_us) {}
+
+    // Call every second while the store can be reached. A host that was not seen before counts as there.
+    void Observe(const std::vector<store::Host>& hosts, std::int64_t now_us);
+    // As of the last Observe; false for an unknown host.
+    bool IsThere(int host) const;
+
+  private:
+    struct Heartbeat {
+        std::int64_t count = 0;
+        std::int64_t changed_us = 0;
+    };
+
+    const std::int64_t away_us_;
+    std::int64_t observed_us_ = 0;
+    std::map<int, Heartbeat> heartbeats_;
+};
+
+struct AssignedHost {
+    int id = 0;
+    bool is_there = false;  // what it has is its own
+    bool runs = false;      // as far as can be told; it may have been stopped a moment ago and start again
+    bool takes = false;     // floating cameras: it runs, has a mount to record to, and does not drain
+};
+
+struct Assignment {
+    std::vector<store::CameraLease> take;  // leases that nobody has, or a host that is away
+    std::vector<int> give;                 // cameras whose lease is this host's
+};
+
+// own: this host's id, which is among the hosts. A floating camera goes to the host that has the fewest cameras.
+Assignment Assign(int own, const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras);
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,162 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/recorder/host_cameras.h"
+
+#include <algorithm>
+#include <string>
+#include <utility>
+
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/base/version.h"
+
+namespace lookhaven::recorder {
+
+namespace {
+
+std::int64_t HeartbeatOf(const std::vector<store::Host>& hosts, int id) {
+    const auto host = std::ranges::find(hosts, id, &store::Host::id);
+    return host == hosts.end() ? -1 : host->heartbeat;
+}
+
+}  // namespace
+
+HostCameras::HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t away_us)
+    : installation_(installation),
+      rows_(rows),
+      own_(installation.HostId()),
+      watch_(away_us),
+      thread_(installation.StoreUrl(), "share the cameras with the other hosts",
+              [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
+
+void HostCameras::Ask(bool has_room) {
+    has_room_ = has_room;
+    thread_.Ask();
+}
+
+std::set<int> HostCameras::Held() const {
+    const std::lock_guard lock(mutex_);
+    seen_ = published_;
+    return held_;
+}
+
+bool HostCameras::IsHeldElsewhere(int camera) const {
+    const std::lock_guard lock(mutex_);
+    return !held_elsewhere_ || held_elsewhere_->contains(camera);
+}
+
+void HostCameras::NoteRecorded(std::set<int> cameras) {
+    const std::lock_guard lock(mutex_);
+    recorded_ = std::move(cameras);
+    noted_ = seen_;
+}
+
+void HostCameras::Work(store::Store& store) {
+    store::Hosts hosts(store);
+    const std::vector<store::Host> all = hosts.All();
+    const std::vector<AssignedHost> watched = Observe(all);
+    if (rows_.IsRefused()) {
+        Publish({});
+        return;
+    }
+    if (!rows_.FirstReservedId()) {
+        return;
+    }
+    NoteVersion(hosts, all);
+    hosts.SetRoom(own_, has_room_);
+    store::CameraLeases leases(store);
+    const std::vector<store::CameraLease> cameras = leases.List();
+    NoteHolders(cameras);
+    const Assignment assignment = Assign(own_, watched, cameras);
+    std::set<int> held;
+    for (const store::CameraLease& camera : cameras) {
+        if (camera.host_id == own_ && std::ranges::find(assignment.give, camera.camera_id) == assignment.give.end()) {
+            held.insert(camera.camera_id);
+        }
+    }
+    Publish(held);
+    for (const int camera : assignment.give) {
+        if (HasEnded(camera)) {
+            leases.Release(camera, own_);
+            base::LogInfo("has given up camera " + std::to_string(camera));
+        }
+    }
+    for (const store::CameraLease& camera : assignment.take) {
+        if (leases.Take(camera, own_, HeartbeatOf(all, camera.host_id))) {
+            held.insert(camera.camera_id);
+            base::LogInfo(
+                "has taken camera " + std::to_string(camera.camera_id) +
+                (camera.host_id == 0 ? "" : " from host " + std::to_string(camera.host_id) + ", which is away"));
+        }
+    }
+    Publish(std::move(held));
+    Report(watched, cameras);
+}
+
+// After an upgrade.
+void HostCameras::NoteVersion(store::Hosts& hosts, const std::vector<store::Host>& all) const {
+    const auto own = std::ranges::find(all, own_, &store::Host::id);
+    if (own != all.end() && own->version != base::kVersion) {
+        store::Host updated = *own;
+        updated.version = base::kVersion;
+        hosts.Update(updated);
+    }
+}
+
+std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& all) {
+    watch_.Observe(all, base::MonotonicMicros());
+    std::vector<AssignedHost> hosts;
+    for (const store::Host& host : all) {
+        const bool is_there = host.id == own_ || watch_.IsThere(host.id);
+        const bool runs = host.id == own_ || (is_there && !host.recorder.empty());
+        const bool has_room = host.id == own_ ? has_room_.load() : host.has_room;
+        hosts.push_back({host.id, is_there, runs, runs && has_room && !host.draining});
+    }
+    return hosts;
+}
+
+void HostCameras::Publish(std::set<int> held) {
+    const std::lock_guard lock(mutex_);
+    if (held != held_) {
+        held_ = std::move(held);
+        ++published_;
+    }
+}
+
+void HostCameras::NoteHolders(const std::vector<store::CameraLease>& cameras) {
+    std::set<int> elsewhere;
+    for (const store::CameraLease& camera : cameras) {
+        if (camera.host_id != 0 && camera.host_id != own_) {
+            elsewhere.insert(camera.camera_id);
+        }
+    }
+    const std::lock_guard lock(mutex_);
+    held_elsewhere_ = std::move(elsewhere);
+}
+
+bool HostCameras::HasEnded(int camera) const {
+    {
+        const std::lock_guard lock(mutex_);
+        if (noted_ != published_ || recorded_.contains(camera)) {
+            return false;
+        }
+    }
+    return !rows_.HasUnstored(camera);
+}
+
+void HostCameras::Report(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+    std::vector<maintenance::HostStatus> states;
+    for (const AssignedHost& host : hosts) {
+        const auto count = std::ranges::count(cameras, host.id, &store::CameraLease::host_id);
+        states.push_back({host.id,
+                          host.id == own_ ? maintenance::HostState::kHere
+                          : host.is_there ? maintenance::HostState::kThere
+                                          : maintenance::HostState::kAway,
+                          static_cast<int>(count)});
+    }
+    if (states != reported_) {
+        maintenance::WriteHostStatus(installation_, states);
+        reported_ = std::move(states);
+    }
+}
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The cameras that this host records, where several share the store: takes, keeps and gives up their leases.
+//
+// Why so        A store that is away from everybody must stop recording nowhere, and a host that alone is cut off cannot
+//               tell the two apart. So a host keeps what it held when it last reached the store. Once its heartbeat has
+//               stood still for long enough, the others take its floating cameras over, and then two record them, until
+//               it reaches the store again and learns within two seconds what it has lost: footage twice, whose ids are
+//               of each host's own block, rather than none. A camera that is fixed to its host is never recorded twice.
+// Invariants    (1) A lease is given up only when the recording has ended and its rows are stored.
+//               (2) Nothing is held before the store says so: a new process begins without cameras.
+// Thread safety Any thread; nothing here waits for the store.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <mutex>
+#include <optional>
+#include <set>
+#include <vector>
+
+#include "standalone/base/installation.h"
+#include "standalone/maintenance/host_status.h"
+#include "standalone/recorder/assignment.h"
+#include "standalone/recorder/event_row_queue.h"
+#include "standalone/recorder/store_thread.h"
+
+namespace lookhaven::recorder {
+
+class HostCameras {
+  public:
+    // Starts the thread. away_us as in HostWatch. rows: holds the lease of this host's recorder. All outlive this
+    // object. Throws std::system_error when no thread can be started.
+    HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t away_us);
+
+    // Call every second: does what is due; does not wait. has_room: there is a mount to record to.
+    void Ask(bool has_room);
+
+    // The cameras to record, until the next call. One thread.
+    std::set<int> Held() const;
+    // Another host has its lease, there or away; also while that is not known yet.
+    bool IsHeldElsewhere(int camera) const;
+    // What runs after all that Held said last was done, and may go on writing.
+    void NoteRecorded(std::set<int> cameras);
+    // As in StoreThread.
+    void RequestStop() { thread_.RequestStop(); }
+    bool HasEnded() const { return thread_.HasEnded(); }
+
+  private:
+    void Work(store::Store& store);
+    void NoteVersion(store::Hosts& hosts, const std::vector<store::Host>& all) const;
+    std::vector<AssignedHost> Observe(const std::vector<store::Host>& all);
+    void Publish(std::set<int> held);
+    void NoteHolders(const std::vector<store::CameraLease>& cameras);
+    bool HasEnded(int camera) const;
+    void Report(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras);
+
+    const base::Installation& installation_;
+    const EventRowQueue& rows_;
+    const int own_;
+    std::atomic<bool> has_room_ = false;
+
+    // Only the thread uses these.
+    HostWatch watch_;
+    std::vector<maintenance::HostStatus> reported_;
+
+    mutable std::mutex mutex_;
+    std::set<int> held_;
+    std::optional<std::set<int>> held_elsewhere_;
+    std::int64_t published_ = 0;     // times that held_ changed
+    mutable std::int64_t seen_ = 0;  // of these, when Held was called last
+    std::set<int> recorded_;
+    std::int64_t noted_ = -1;  // of these, what recorded_ follows
+    StoreThread thread_;       // last: it uses the others
+};
+
+}  // namespace lookhaven::recorder

@@ -1,0 +1,131 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Which cameras a host takes and gives away, and which hosts it takes for away.
+#include "standalone/recorder/assignment.h"
+
+#include <string>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+namespace lookhaven::recorder {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr AssignedHost kTakes{0, true, true, true};
+constexpr AssignedHost kDrains{0, true, true, false};
+constexpr AssignedHost kStopped{0, true, false, false};
+constexpr AssignedHost kAway{0, false, false, false};
+
+// Hosts 1, 2, … in these states.
+std::vector<AssignedHost> Hosts(std::vector<AssignedHost> states) {
+    for (int id = 0; AssignedHost & state : states) {
+        state.id = ++id;
+    }
+    return states;
+}
+
+struct Case {
+    const char* name;
+    std::vector<AssignedHost> hosts;  // this one is the first
+    store::CameraLease camera;
+    bool takes = false;
+    bool gives = false;
+};
+
+TEST(Assignment, ACameraMovesWhenItMustAndSomebodyTakesIt) {
+    const Case cases[] = {
+        {"free", {kTakes}, {.host_id = 0}, true},
+        {"of an unknown host", {kTakes}, {.host_id = 9}, true},
+        {"of a host that is away", {kTakes, kAway}, {.host_id = 2}, true},
+        {"of a host that was stopped a moment ago", {kTakes, kStopped}, {.host_id = 2}},
+        {"of another host", {kTakes, kTakes}, {.host_id = 2}},
+        {"free and disabled", {kTakes}, {.enabled = false}},
+        {"own and disabled", {kTakes}, {.enabled = false, .host_id = 1}, false, true},
+        {"own", {kTakes, kTakes}, {.host_id = 1}},
+        {"free, and this host drains", {kDrains, kTakes}, {.host_id = 0}},
+        {"own, and this host drains", {kDrains, kTakes}, {.host_id = 1}, false, true},
+        {"own, and all drain", {kDrains, kDrains}, {.host_id = 1}},
+        {"own, and only a stopped host could take it", {kDrains, kStopped}, {.host_id = 1}},
+        {"fixed to this host, and free", {kDrains, kTakes}, {.fixed_host_id = 1}, true},
+        {"fixed to this host, of one that runs", {kTakes, kTakes}, {.fixed_host_id = 1, .host_id = 2}},
+        {"fixed to this host, of one that is away", {kTakes, kAway}, {.fixed_host_id = 1, .host_id = 2}, true},
+        {"fixed to another, and free", {kTakes, kAway}, {.fixed_host_id = 2}},
+        {"fixed to another, which is away and has it", {kTakes, kAway}, {.fixed_host_id = 2, .host_id = 2}},
+        {"own, fixed to another", {kTakes, kDrains}, {.fixed_host_id = 2, .host_id = 1}, false, true},
+        {"own, fixed to another that is away", {kTakes, kAway}, {.fixed_host_id = 2, .host_id = 1}},
+        {"own and fixed, while it drains", {kDrains, kTakes}, {.fixed_host_id = 1, .host_id = 1}},
+        {"own, moved to another", {kTakes, kTakes}, {.host_id = 1, .next_host_id = 2}, false, true},
+        {"own, moved to one that is away", {kTakes, kAway}, {.host_id = 1, .next_host_id = 2}},
+        {"moved to another, and free", {kTakes, kTakes}, {.next_host_id = 2}},
+        {"moved to one that is away, and free", {kTakes, kAway}, {.next_host_id = 2}, true},
+    };
+    for (Case each : cases) {
+        SCOPED_TRACE(each.name);
+        each.camera.camera_id = 5;
+        const Assignment assignment = Assign(1, Hosts(each.hosts), {each.camera});
+        EXPECT_EQ(assignment.take.size(), each.takes ? 1U : 0U);
+        EXPECT_EQ(assignment.give.size(), each.gives ? 1U : 0U);
+    }
+}
+
+TEST(Assignment, FreeCamerasGoToTheHostsWithTheFewest) {
+    std::vector<store::CameraLease> cameras;
+    for (int id = 1; id <= 9; ++id) {
+        cameras.push_back({.camera_id = id, .host_id = id <= 2 ? 1 : 0});
+    }
+    const auto taken_by = [&cameras](int own, const std::vector<AssignedHost>& hosts) {
+        std::vector<int> taken;
+        for (const store::CameraLease& camera : Assign(own, hosts, cameras).take) {
+            taken.push_back(camera.camera_id);
+        }
+        return taken;
+    };
+    const auto hosts = Hosts({kTakes, kTakes, kTakes, kDrains});
+    EXPECT_THAT(taken_by(1, hosts), ElementsAre(7));
+    EXPECT_THAT(taken_by(2, hosts), ElementsAre(3, 5, 8));
+    EXPECT_THAT(taken_by(3, hosts), ElementsAre(4, 6, 9));
+    EXPECT_THAT(taken_by(4, hosts), IsEmpty());
+}
+
+class HostWatchTest : public testing::Test {
+  protected:
+    void Pass(int seconds, int raised_host = 0) {
+        for (; seconds > 0; --seconds) {
+            now_us_ += 1'000'000;
+            for (store::Host& host : hosts_) {
+                host.heartbeat += host.id == raised_host ? 1 : 0;
+            }
+            watch_.Observe(hosts_, now_us_);
+        }
+    }
+
+    HostWatch watch_{30'000'000};
+    std::vector<store::Host> hosts_{{.id = 1}, {.id = 2}};
+    std::int64_t now_us_ = 7'000'000'000;
+};
+
+TEST_F(HostWatchTest, AHostIsAwayOnceItsHeartbeatHasStoodStill) {
+    Pass(30, 1);
+    EXPECT_TRUE(watch_.IsThere(1) && watch_.IsThere(2)) << "seen for less than half a minute";
+    Pass(1, 1);
+    EXPECT_TRUE(watch_.IsThere(1));
+    EXPECT_FALSE(watch_.IsThere(2) || watch_.IsThere(3));
+    hosts_[1].heartbeat = -5;
+    Pass(1, 1);
+    EXPECT_TRUE(watch_.IsThere(2)) << "a store that lost its last seconds has a lower count";
+}
+
+TEST_F(HostWatchTest, NobodyIsAwayBecauseTheStoreWas) {
+    Pass(25, 1);
+    now_us_ += 3'600'000'000;
+    Pass(30);
+    EXPECT_TRUE(watch_.IsThere(1) && watch_.IsThere(2));
+    Pass(1);
+    EXPECT_FALSE(watch_.IsThere(1) || watch_.IsThere(2));
+}
+
+}  // namespace
+}  // namespace lookhaven::recorder
