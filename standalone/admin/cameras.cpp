@@ -151,6 +151,9 @@ Json::Value ToJson(const CameraSetup& setup) {
     json["account"] = setup.credentials ? setup.credentials->account : "";
     json["hasPassword"] = !PasswordOf(setup).empty();
     json["plan"] = PlanJson(setup.plan);
+    if (camera.host_id != 0) {
+        json["host"] = camera.host_id;
+    }
     json["group"] = Json::arrayValue;
     for (const int group : setup.groups) {
         json["group"].append(group);

@@ -67,6 +67,7 @@ Json::Value MountRecord(const store::Mount& mount) {
 
 store::Mount AddMount(store::Store& store, const Actor& actor, const MountChange& change) {
     store::Mount mount;
+    mount.host_id = change.own_host;
     change.ApplyTo(mount);
     RequireFreeFolder(store, mount.path, 0, change.take_over);
     if (mount.name.empty()) {
@@ -87,6 +88,9 @@ store::Mount SetMount(store::Store& store, const Actor& actor, int id, std::opti
     store::Mount mount = known;
     change.ApplyTo(mount);
     const bool is_marked = change.path || change.take_over;
+    if (is_marked && !known.IsOf(change.own_host)) {
+        throw store::InvalidRecord("the mount \"" + known.name + "\" is another host's: change its folder there");
+    }
     if (is_marked) {
         RequireFreeFolder(store, RequireFolder(mount.path), id, change.take_over);
     }

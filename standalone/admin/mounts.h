@@ -28,6 +28,7 @@ struct MountChange {
     std::optional<std::int64_t> max_age_s = {};
     std::optional<bool> enabled = {};
     bool is_default = false;  // can be set, not cleared
+    int own_host = 0;         // the machine's own: OwnHost of hosts.h
     bool take_over = false;   // also a folder that is another mount's
     bool confirmed = false;   // also where a lower limit deletes recordings
 

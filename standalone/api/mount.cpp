@@ -11,6 +11,7 @@
 #include <unistd.h>
 
 #include "standalone/admin/change.h"
+#include "standalone/admin/hosts.h"
 #include "standalone/admin/mount_claim.h"
 #include "standalone/admin/mount_forecast.h"
 #include "standalone/admin/mount_place.h"
@@ -230,6 +231,7 @@ std::string List(const Call& call) {
 std::string Add(const Call& call) {
     admin::MountChange change = ChangeOf(call);
     change.path = call.Parameter("path").asString();
+    change.own_host = admin::OwnHost(call.Records(), call.context.Installation());
     admin::RequireMountPlace(call.Records(), call.context.Installation(), *change.path);
     try {
         return AnswerRecord(call, admin::AddMount(call.Records(), call.Actor(), change));

@@ -6,6 +6,7 @@
 #include "standalone/admin/camera_stream.h"
 #include "standalone/admin/cameras.h"
 #include "standalone/admin/devices.h"
+#include "standalone/admin/hosts.h"
 #include "standalone/base/codec_words.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
@@ -31,6 +32,7 @@ struct Request {
     std::string target;  // of a probe: an id or an address
     bool insecure = false;
     std::optional<std::string> account;
+    std::optional<std::string> host;
     std::vector<std::string> hours;
     bool deletes_footage = false;
     store::PortCounts ports;
@@ -43,6 +45,9 @@ Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
         Object("id", camera.id, "name", camera.name, "enabled", camera.enabled, "video_type",
                static_cast<int>(camera.video_type), "live_profile", camera.live_profile, "ptz", camera.ptz, "audio",
                camera.audio, "insecure", camera.insecure, "recording", PlanData(plan));
+    if (camera.host_id != 0) {
+        data["host"] = camera.host_id;
+    }
     for (const store::CameraProfile& profile : camera.profiles) {
         data["profiles"].append(Object("number", profile.number, "source", profile.source, "width", profile.width,
                                        "height", profile.height, "fps", profile.fps));
@@ -121,10 +126,17 @@ void ApplyPlan(admin::CameraSetup& setup, const Request& request) {
     }
 }
 
+void ApplyHost(store::Store& store, Camera& camera, const Request& request) {
+    if (request.host) {
+        camera.host_id = admin::HostNamed(store, *request.host);
+    }
+}
+
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     admin::CameraSetup setup;
     request.options.ApplyTo(setup.camera);
+    ApplyHost(store, setup.camera, request);
     RequireSources(setup.camera);
     setup = admin::AddCamera(store, {}, pattern::AllSourceKinds(), setup, [&](admin::CameraSetup& camera) {
         camera.credentials = AskCredentials(request);
@@ -158,9 +170,11 @@ void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     RequireCamera(cameras, request.id);
-    const admin::CameraSetup setup =
-        admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
-                         [&request](admin::CameraSetup& camera) { Edit(camera, request); });
+    const admin::CameraSetup setup = admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
+                                                      [&](admin::CameraSetup& camera) {
+                                                          ApplyHost(store, camera.camera, request);
+                                                          Edit(camera, request);
+                                                      });
     console.Answer(ToData(setup.camera, setup.plan.value_or(store::NoPlan())), "Changed camera ", request.id, ".");
 }
 
@@ -254,17 +268,21 @@ void AddCamera(CLI::App& program, const Console& console) {
     Request& request = group.request();
     const std::string id = "The camera's id";
     const std::string account = "The camera's account; prompts for its password";
+    const std::string host = "The host of lookhaven host that alone records it; any for whichever has room";
 
     Command add = group.Add("add", "Adds a camera; --name and --source are required", Add);
     request.options.AddTo(add);
     request.recording.AddTo(add);
-    add.Option("--account", request.account, account).Require("--name").Require("--source");
+    add.Option("--account", request.account, account)
+        .Option("--host", request.host, host)
+        .Require("--name")
+        .Require("--source");
 
     Command set = group.Add("set", "Changes the given properties of a camera", Change);
     set.Option("id", request.id, id, Required);
     request.options.AddTo(set);
     request.recording.AddTo(set);
-    set.Option("--account", request.account, account + "; empty for none");
+    set.Option("--account", request.account, account + "; empty for none").Option("--host", request.host, host);
 
     group.Add("list", "Lists the cameras", List);
     group.Add("remove", "Removes a camera", Remove)

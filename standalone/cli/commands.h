@@ -22,6 +22,7 @@ void AddEvent(CLI::App& program, const Console& console);
 void AddExport(CLI::App& program, const Console& console);
 void AddEmap(CLI::App& program, const Console& console);
 void AddDevices(CLI::App& program, const Console& console);
+void AddHosts(CLI::App& program, const Console& console);
 void AddServer(CLI::App& program, const Console& console);
 void AddSetting(CLI::App& program, const Console& console);
 void AddStore(CLI::App& program, const Console& console);

@@ -3,6 +3,7 @@
 // lookhaven mount: the folders that recordings are written to.
 #include <optional>
 
+#include "standalone/admin/hosts.h"
 #include "standalone/admin/mounts.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
@@ -64,7 +65,7 @@ constexpr Column kColumns[] = {
     {"path", "path"},
     {"", "", StateText}};
 
-admin::MountChange ChangeOf(const Request& request) {
+admin::MountChange ChangeOf(const Console& console, store::Store& store, const Request& request) {
     admin::MountChange change{.name = request.name, .enabled = request.enabled};
     if (!request.path.empty()) {
         change.path = request.path;
@@ -75,6 +76,7 @@ admin::MountChange ChangeOf(const Request& request) {
     if (request.max_age) {
         change.max_age_s = ParseDuration(*request.max_age);
     }
+    change.own_host = admin::OwnHost(store, console.Installation());
     change.is_default = request.make_default;
     change.take_over = request.take_over;
     change.confirmed = request.yes;
@@ -83,14 +85,14 @@ admin::MountChange ChangeOf(const Request& request) {
 
 void Add(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const Mount mount = admin::AddMount(store, {}, ChangeOf(request));
+    const Mount mount = admin::AddMount(store, {}, ChangeOf(console, store, request));
     console.Answer(ToData(mount), "Added mount ", mount.name, " with id ", mount.id, ".");
 }
 
 void Change(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     try {
-        const Mount mount = admin::SetMount(store, {}, request.id, {}, ChangeOf(request));
+        const Mount mount = admin::SetMount(store, {}, request.id, {}, ChangeOf(console, store, request));
         console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
     } catch (const admin::DeletesRecordings& refusal) {
         const maintenance::RetentionForecast& loss = refusal.Loss();

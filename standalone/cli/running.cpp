@@ -28,7 +28,7 @@ void RequireStopped(const base::Installation& installation) {
 }
 
 void RequireNoOtherRecorder(const base::Installation& installation, store::Store& store) {
-    store::RecorderLease lease(store);
+    store::RecorderLease lease(store, installation.HostId());
     const store::LeaseState before = lease.Current();
     if (before.holder.empty() || before.holder == store::RecorderName(installation)) {
         return;

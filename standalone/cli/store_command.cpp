@@ -8,6 +8,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/running.h"
 #include "standalone/store/copy.h"
+#include "standalone/store/hosts.h"
 
 namespace lookhaven::cli {
 
@@ -46,6 +47,10 @@ void Move(const Console& console, const Request& request) {
     }
     const base::Installation installation = console.Installation();
     store::Store source = console.OpenStore();
+    if (!store::Hosts(source).All().empty()) {
+        throw Failure(kDataError, "hosts share this store, so it is moved by PostgreSQL's own means: stop all hosts,"
+                                  " dump and restore the database, and write its address into the file store of each");
+    }
     RequireStopped(installation);
     RequireNoOtherRecorder(installation, source);
     if (url == installation.StoreUrl()) {

@@ -56,8 +56,14 @@ std::map<int, std::string> RequireOwnMounts(store::Store& store, const base::Ins
 
 void Verify(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
-    const std::map<int, std::string> left_alone =
+    std::map<int, std::string> left_alone =
         request.repair ? RequireOwnMounts(store, console.Installation()) : std::map<int, std::string>();
+    const int host = console.Installation().HostId();
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        if (!mount.IsOf(host)) {
+            left_alone[mount.id] = "";
+        }
+    }
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;
     const maintenance::VerifyReport report = maintenance::Verify(
         store, request.repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>(), left_alone);

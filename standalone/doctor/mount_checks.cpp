@@ -111,14 +111,14 @@ Findings CheckEnabled(store::Store& store, const store::Mount& mount) {
 }
 
 // Cameras that are to be recorded to each mount.
-std::map<int, int> CountCamerasByMount(store::Store& store) {
+std::map<int, int> CountCamerasByMount(store::Store& store, int host) {
     std::map<int, int> cameras;
     const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(store).List();
     store::Mounts mounts(store);
     for (const store::Camera& camera : store::Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
         if (camera.enabled && plan != plans.end() && plan->second.mode != store::RecordMode::kNever) {
-            const auto mount = mounts.FindForPlan(plan->second.mount_id);
+            const auto mount = mounts.FindForPlan(plan->second.mount_id, host);
             ++cameras[mount ? mount->id : 0];
         }
     }
@@ -133,15 +133,18 @@ Findings CheckDisabled(const store::Mount& mount, int cameras) {
 
 }  // namespace
 
+// Those of this machine, which alone can look at them.
 Findings CheckMounts(const base::Installation& installation) {
     Findings findings;
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
-        const std::vector<store::Mount> mounts = store::Mounts(store).List();
+        std::vector<store::Mount> mounts = store::Mounts(store).List();
+        const int host = installation.HostId();
+        std::erase_if(mounts, [host](const store::Mount& mount) { return !mount.IsOf(host); });
         if (mounts.empty()) {
             return {{"there is no mount to record to", "lookhaven init"}};
         }
-        std::map<int, int> cameras = CountCamerasByMount(store);
+        std::map<int, int> cameras = CountCamerasByMount(store, host);
         for (const store::Mount& mount : mounts) {
             try {
                 std::ranges::move(mount.enabled ? CheckEnabled(store, mount) : CheckDisabled(mount, cameras[mount.id]),

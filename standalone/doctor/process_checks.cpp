@@ -44,7 +44,7 @@ Findings CheckActiveRecorder(const base::Installation& installation) {
     }
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
-        const std::string holder = store::RecorderLease(store).Current().holder;
+        const std::string holder = store::RecorderLease(store, installation.HostId()).Current().holder;
         if (!holder.empty() && holder != store::RecorderName(installation)) {
             return {{"the cameras of this store are recorded by the recorder of " + holder,
                      "stop one of the two recorders, or give each a store of its own"}};

@@ -39,7 +39,10 @@ class Verification {
     VerifyReport Run() {
         for (const store::Mount& mount : store::Mounts(store_).List()) {
             if (const auto why = left_alone_.find(mount.id); why != left_alone_.end()) {
-                report_.faults.push_back({"mount " + std::to_string(mount.id) + " was left alone: " + why->second, ""});
+                if (!why->second.empty()) {
+                    report_.faults.push_back(
+                        {"mount " + std::to_string(mount.id) + " was left alone: " + why->second, ""});
+                }
                 continue;
             }
             try {
@@ -219,7 +222,7 @@ class Verification {
                              const std::string& path) {
         // First: a recorder that takes the lease after this has higher ids.
         int new_id = repair_ ? events_.NextId() : 0;
-        const store::LeaseState lease = store::RecorderLease(store_).Current();
+        const store::LeaseState lease = store::AnyRecorder(store_);
         const bool has_recorder = !lease.holder.empty();
         if (has_recorder && name.event >= lease.first_reserved_id && name.event < listed_below_) {
             report_.faults.push_back(

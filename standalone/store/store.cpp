@@ -182,6 +182,10 @@ Store Store::Open(const std::string& url) {
     return Store(std::move(connection));
 }
 
+bool Store::IsSqlite() const {
+    return connection_->IsSqlite();
+}
+
 bool Store::IsUpToDate() try {
     return ReadVersionOfReady(*connection_) == SchemaVersion();
 } catch (const std::exception&) {

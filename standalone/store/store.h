@@ -85,6 +85,9 @@ class Store {
     enum class Copy { kNow, kAhead };
     static bool CopyIfOlder(const std::string& url, const std::filesystem::path& folder, Copy when = Copy::kNow);
 
+    // A file of one machine, as opposed to a server that several can reach.
+    bool IsSqlite() const;
+
     // The schema version this program needs.
     static int SchemaVersion();
 

@@ -3,8 +3,10 @@
 // Hosts that share a store: their records, what is theirs, and the lease of each one's recorder.
 #include "standalone/store/hosts.h"
 
+#include <atomic>
 #include <utility>
 
+#include "standalone/store/camera_leases.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/settings.h"
@@ -132,6 +134,59 @@ TEST_P(HostTest, AHostThatCamerasWaitForIsNotRemoved) {
     cameras.Update(With(*cameras.Find(id), &Camera::host_id, 0));
     hosts_.Remove(host);
     EXPECT_EQ(hosts_.HostOfCamera(id), 0);
+}
+
+TEST_P(HostTest, ALeaseOfACameraChangesHandsOnlyAsItWasSeen) {
+    const int first = hosts_.Add(Named("nvr1"));
+    const int second = hosts_.Add(Named("nvr2"));
+    const int id = AddCamera();
+    CameraLeases leases(store_);
+    const auto seen = [&] { return leases.List().front(); };
+    const CameraLease free = seen();
+    EXPECT_EQ(free, (CameraLease{.camera_id = id}));
+    EXPECT_FALSE(leases.Take(With(free, &CameraLease::camera_id, 99), first, 0)) << "there is no such camera";
+    EXPECT_TRUE(leases.Take(free, first, 0));
+    EXPECT_FALSE(leases.Take(free, second, 0)) << "somebody was faster";
+    const CameraLease held = seen();
+    RecorderLease(store_, first).Take(0, "a", 1);
+    EXPECT_FALSE(leases.Take(held, second, 0)) << "its host's heartbeat has changed";
+    EXPECT_TRUE(leases.Take(held, second, 1)) << "it stands still";
+    EXPECT_FALSE(leases.Take(held, first, 0)) << "it has changed hands";
+    leases.Release(id, first);
+    EXPECT_EQ(hosts_.HostOfCamera(id), second) << "what it has lost it cannot give up";
+    leases.Move(id, first);
+    leases.Release(id, second);
+    EXPECT_EQ(seen(), (CameraLease{.camera_id = id, .count = 3, .next_host_id = first}));
+    EXPECT_TRUE(leases.Take(seen(), first, 0));
+    EXPECT_EQ(seen().next_host_id, 0) << "it was moved once";
+    const CameraLease last = seen();
+    hosts_.Remove(first);
+    EXPECT_EQ(hosts_.HostOfCamera(id), 0);
+    EXPECT_FALSE(leases.Take(last, second, 1));
+    EXPECT_TRUE(leases.Take(seen(), second, 0));
+}
+
+TEST_P(HostTest, OfManyOnOneCameraOneGetsTheLease) {
+    const int host = hosts_.Add(Named("nvr1"));
+    AddCamera();
+    const CameraLease seen = CameraLeases(store_).List().front();
+    std::atomic<int> taken = 0;
+    StoreTest::InParallel(5, [&](Store& store) { taken += CameraLeases(store).Take(seen, host, 0) ? 1 : 0; });
+    EXPECT_EQ(taken, 1);
+}
+
+TEST_P(HostTest, AfterTheLastHostItsMountsAreASingleMachinesAgain) {
+    const int first = hosts_.Add(Named("nvr1"));
+    const int second = hosts_.Add(Named("nvr2"));
+    const int own = AddMount("own", "/srv/a", first);
+    const int far = AddMount("far", "/srv/a", second);
+    EXPECT_EQ(mounts_.FindForPlan(0, second)->id, far);
+    EXPECT_EQ(mounts_.FindForPlan(own, second)->id, far) << "the other host's mount is not here";
+    hosts_.Remove(second);
+    hosts_.Remove(first);
+    EXPECT_EQ(hosts_.HostOfMount(own), 0);
+    EXPECT_EQ(hosts_.HostOfMount(far), second);
+    EXPECT_EQ(mounts_.FindForPlan(0)->id, own);
 }
 
 LOOKHAVEN_ON_BOTH_ENGINES(HostTest);

@@ -1,0 +1,135 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/admin/hosts.h"
+
+#include <algorithm>
+#include <map>
+#include <vector>
+
+#include "standalone/admin/change.h"
+#include "standalone/store/camera_leases.h"
+#include "standalone/store/events.h"
+#include "standalone/store/mounts.h"
+
+namespace lookhaven::admin {
+
+namespace {
+
+store::Host RequireHost(store::Store& store, const std::string& name) {
+    std::optional<store::Host> host = store::Hosts(store).FindByName(name);
+    if (!host) {
+        throw store::NotFound("there is no host \"" + name + "\": see lookhaven host list");
+    }
+    return *std::move(host);
+}
+
+// The cameras that may move, by the host that has each.
+std::map<int, std::vector<int>> FloatingCameras(store::Store& store, const std::vector<store::Host>& hosts) {
+    std::map<int, std::vector<int>> cameras;
+    for (const store::Host& host : hosts) {
+        if (host.has_room && !host.draining && !host.recorder.empty()) {
+            cameras[host.id];
+        }
+    }
+    for (const store::CameraLease& lease : store::CameraLeases(store).List()) {
+        if (lease.enabled && lease.fixed_host_id == 0 && cameras.contains(lease.host_id)) {
+            cameras[lease.host_id].push_back(lease.camera_id);
+        }
+    }
+    return cameras;
+}
+
+}  // namespace
+
+Json::Value HostRecord(const store::Host& host) {
+    Json::Value json;
+    json["id"] = host.id;
+    json["name"] = host.name;
+    json["address"] = host.address;
+    json["port"] = host.port;
+    json["version"] = host.version;
+    json["draining"] = host.draining;
+    return json;
+}
+
+store::Host DrainHost(store::Store& store, const Actor& actor, const std::string& name, bool draining) {
+    store::Host host;
+    Apply(store, actor, [&] {
+        const store::Host before = RequireHost(store, name);
+        host = before;
+        host.draining = draining;
+        store::Hosts(store).Update(host);
+        return Change{"host.set", Named(name, host.id), HostRecord(before), HostRecord(host)};
+    });
+    return host;
+}
+
+std::int64_t FootageOf(store::Store& store, int host) {
+    std::int64_t events = 0;
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        events += mount.host_id == host ? store::Events(store).Content(mount.id).events : 0;
+    }
+    return events;
+}
+
+store::Host RemoveHost(store::Store& store, const Actor& actor, const std::string& name, bool confirmed) {
+    store::Host host;
+    try {
+        Apply(store, actor, [&] {
+            host = RequireHost(store, name);
+            const bool is_last = store::Hosts(store).All().size() == 1;
+            const std::int64_t events = is_last || confirmed ? 0 : FootageOf(store, host.id);
+            if (events > 0) {
+                throw StillNeeded("there are " + std::to_string(events) + " recordings on the mounts of " + name +
+                                  ", which can be played on that host alone");
+            }
+            store::Hosts(store).Remove(host.id);
+            return Change{"host.remove", Named(name, host.id), HostRecord(host), {}};
+        });
+    } catch (const store::InvalidRecord& error) {
+        throw StillNeeded(error.what());
+    }
+    return host;
+}
+
+int BalanceHosts(store::Store& store, const Actor& actor) {
+    int moves = 0;
+    Apply(store, actor, [&] {
+        std::map<int, std::vector<int>> cameras = FloatingCameras(store, store::Hosts(store).All());
+        const auto fewer = [](const auto& one, const auto& other) { return one.second.size() < other.second.size(); };
+        Json::Value moved;
+        while (cameras.size() > 1) {
+            const auto least = std::ranges::min_element(cameras, fewer);
+            const auto most = std::ranges::max_element(cameras, fewer);
+            if (most->second.size() <= least->second.size() + 1) {
+                break;
+            }
+            const int camera = most->second.back();
+            most->second.pop_back();
+            least->second.push_back(camera);
+            store::CameraLeases(store).Move(camera, least->first);
+            moved[std::to_string(camera)] = least->first;
+            ++moves;
+        }
+        return Change{"host.balance", "cameras", {}, moved};
+    });
+    return moves;
+}
+
+int HostNamed(store::Store& store, const std::string& name) {
+    return name == kAnyHost ? 0 : RequireHost(store, name).id;
+}
+
+int OwnHost(store::Store& store, const base::Installation& installation) {
+    const std::vector<store::Host> hosts = store::Hosts(store).All();
+    const int own = installation.HostId();
+    if (hosts.empty()) {
+        return 0;
+    }
+    if (std::ranges::find(hosts, own, &store::Host::id) == hosts.end()) {
+        throw store::InvalidRecord("hosts share this store, and this machine is none of them: add it with lookhaven"
+                                   " host add");
+    }
+    return own;
+}
+
+}  // namespace lookhaven::admin
