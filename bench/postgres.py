@@ -61,9 +61,13 @@ class Postgres:
         self._run("psql", "-q", "-h", self._folder, "-U", "postgres", "-d", database, "-c",
                   f"copy {table} ({', '.join(columns)}) from stdin", stdin=text)
 
+    def ask(self, database, statement):
+        """What it answers, as text."""
+        return self._run("psql", "-qtA", "-h", self._folder, "-U", "postgres", "-d", database, "-c", statement).strip()
+
     def _run(self, program, *arguments, stdin=""):
-        subprocess.run([PROGRAMS / program, *arguments], cwd=self._folder, input=stdin, text=True, check=True,
-                       stdout=subprocess.DEVNULL, **self._user)
+        return subprocess.run([PROGRAMS / program, *arguments], cwd=self._folder, input=stdin, text=True, check=True,
+                              stdout=subprocess.PIPE, **self._user).stdout
 
     @staticmethod
     def _state(path):

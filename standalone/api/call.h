@@ -34,6 +34,7 @@ struct Call {
     Parameters parameters;
     std::map<std::string, std::string> cookies;
     std::optional<binding::Login> login;  // of the cookie's session
+    bool is_forwarded = false;            // by another host of the same store
 
     binding::RequestContext& context;
     control::SlotTable& slots;

@@ -7,6 +7,7 @@
 #include "standalone/api/health.h"
 #include "standalone/base/clock.h"
 #include "standalone/control/common_config.h"
+#include "standalone/store/hosts.h"
 
 namespace lookhaven::api {
 
@@ -17,6 +18,14 @@ CameraPage::CameraPage(const Call& call, std::optional<int> camera_id)
     }
     const base::Installation& installation = call.context.Installation();
     is_recorder_alive_ = control::FindRecorder(installation) == control::RecorderState::kAlive;
+    if (const int own_host = installation.HostId(); own_host != 0) {
+        store::Hosts hosts(call.Records());
+        for (const store::Camera& camera : cameras_) {
+            if (const int host = hosts.HostOfCamera(camera.id); host != 0 && host != own_host) {
+                elsewhere_.insert(camera.id);
+            }
+        }
+    }
     if (!is_recorder_alive_) {
         return;  // what it told last is stale
     }
@@ -58,12 +67,12 @@ void CameraPage::AddState(Json::Value& record) const {
     }
     const auto status = states_.find(id);
     const bool is_lost = status != states_.end() && status->second.lost_since_s > 0;
-    record["state"] = !record["enabled"].asBool() ? "disabled"
-                      : !is_recorder_alive_       ? "unknown"
-                      : is_lost                   ? "no-signal"
-                      : has_picture               ? "running"
-                      : streams != streams_.end() ? "connecting"
-                                                  : "idle";
+    record["state"] = !record["enabled"].asBool()                      ? "disabled"
+                      : !is_recorder_alive_ || elsewhere_.contains(id) ? "unknown"
+                      : is_lost                                        ? "no-signal"
+                      : has_picture                                    ? "running"
+                      : streams != streams_.end()                      ? "connecting"
+                                                                       : "idle";
     record["reason"] = is_lost ? std::string(base::NameOf(status->second.loss)) : "";
     record["since"] = is_lost ? Json::Value(Json::Int64{status->second.lost_since_s}) : Json::Value();
     record["recording"] = status == states_.end() ? "" : maintenance::NameOf(status->second.state);

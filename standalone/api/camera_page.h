@@ -5,6 +5,7 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <vector>
 
 #include <json/json.h>
@@ -32,6 +33,7 @@ class CameraPage {
 
     std::vector<store::Camera> cameras_;
     bool is_recorder_alive_ = false;
+    std::set<int> elsewhere_;  // recorded by another host, whose recorder tells nothing here
     std::map<int, maintenance::RecordingStatus> states_;
     std::map<int, std::vector<control::StreamCounters>> streams_;  // by camera
     std::optional<std::map<int, store::CameraFootage>> footage_;

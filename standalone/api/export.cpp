@@ -157,6 +157,18 @@ std::string PlanExport(const Call& call) {
     return SuccessAnswer(data);
 }
 
+std::set<int> MountsOfExport(const Call& call) {
+    const std::set<int> cameras = CamerasOf(call);
+    const archive::TimeSpan span = SpanOf(call, base::WallSeconds());
+    std::set<int> mounts;
+    if (std::ranges::all_of(cameras, [](int id) { return binding::MayUse(id, store::CameraAccess::kExport); })) {
+        store::Events(call.Records())
+            .Visit({.camera_ids = cameras, .begin_s = span.begin_ms / 1000, .end_s = span.end_ms / 1000},
+                   [&mounts](const store::Event& event) { mounts.insert(event.mount_id); });
+    }
+    return mounts;
+}
+
 std::string Export(const Call& call) {
     const media::RemuxLibrary& remux = media::LoadRemuxLibrary();
     const std::filesystem::path key = call.context.Installation().SigningKeyFile();

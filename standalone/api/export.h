@@ -3,6 +3,7 @@
 // Sends a span of several cameras as a file to keep.
 #pragma once
 
+#include <set>
 #include <string>
 
 #include "standalone/api/call.h"
@@ -15,5 +16,8 @@ namespace lookhaven::api {
 // the account, or in all, are running as may; 500 when footage cannot be read.
 std::string PlanExport(const Call& call);
 std::string Export(const Call& call);
+
+// The mounts on which lies what is asked for; none where the caller may not have all of it. Throws Failure 400.
+std::set<int> MountsOfExport(const Call& call);
 
 }  // namespace lookhaven::api

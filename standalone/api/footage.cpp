@@ -18,18 +18,6 @@ Footage Of(const store::Event& event) {
             event.start_s, event.end_s,  event.recording, event.path};
 }
 
-std::optional<Footage> Find(store::Store& records, std::optional<store::MarkKind> kind, int id) {
-    if (kind) {
-        const auto mark = store::Marks(records).Find(*kind, id);
-        const bool is_saved = mark && mark->state == store::MarkState::kSaved && !mark->demo;
-        return is_saved ? std::optional(Footage{id, kind, mark->camera_id, mark->mount_id, mark->start_s, mark->end_s,
-                                                false, mark->path})
-                        : std::nullopt;
-    }
-    const auto event = store::Events(records).Find(id);
-    return event && !event->demo ? std::optional(Of(*event)) : std::nullopt;
-}
-
 Footage Require(const Call& call, std::optional<Footage> footage, store::CameraAccess access) {
     const auto mount = footage ? store::Mounts(call.Records()).Find(footage->mount_id) : std::nullopt;
     if (mount) {
@@ -56,14 +44,22 @@ std::optional<store::MarkKind> KindOf(const Call& call) {
     return found->second;
 }
 
-Footage RequireFootage(const Call& call, store::CameraAccess access) {
-    const auto kind = KindOf(call);
-    return Require(call, Find(call.Records(), kind, call.Parameter("event").asInt()), access);
+std::optional<Footage> FindFootage(store::Store& records, std::optional<store::MarkKind> kind, int id) {
+    if (kind) {
+        const auto mark = store::Marks(records).Find(*kind, id);
+        const bool is_saved = mark && mark->state == store::MarkState::kSaved && !mark->demo;
+        return is_saved ? std::optional(Footage{id, kind, mark->camera_id, mark->mount_id, mark->start_s, mark->end_s,
+                                                false, mark->path})
+                        : std::nullopt;
+    }
+    const auto event = store::Events(records).Find(id);
+    return event && !event->demo ? std::optional(Of(*event)) : std::nullopt;
 }
 
-Footage RequestedFootage(const Call& call) {
+std::optional<Footage> FindRequestedFootage(const Call& call) {
     if (!call.Parameter("event").isNull()) {
-        return RequireFootage(call);
+        const auto kind = KindOf(call);
+        return FindFootage(call.Records(), kind, call.Parameter("event").asInt());
     }
     const int camera = call.Parameter("camera").asInt();
     if (camera <= 0 || call.Parameter("time_ms").isNull()) {
@@ -77,7 +73,16 @@ Footage RequestedFootage(const Call& call) {
     if (!event) {
         throw Failure(404, "nothing was recorded at or before that time");
     }
-    return Require(call, event->demo ? std::nullopt : std::optional(Of(*event)), store::CameraAccess::kPlayback);
+    return event->demo ? std::nullopt : std::optional(Of(*event));
+}
+
+Footage RequireFootage(const Call& call, store::CameraAccess access) {
+    const auto kind = KindOf(call);
+    return Require(call, FindFootage(call.Records(), kind, call.Parameter("event").asInt()), access);
+}
+
+Footage RequestedFootage(const Call& call) {
+    return Require(call, FindRequestedFootage(call), store::CameraAccess::kPlayback);
 }
 
 archive::RecordingReader OpenFootage(const Call& call, const Footage& footage, std::int64_t until_ms) {

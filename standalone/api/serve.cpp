@@ -14,7 +14,9 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/api/decoder_sandbox.h"
+#include "standalone/api/elsewhere.h"
 #include "standalone/api/emap_setup.h"
+#include "standalone/api/forward.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/concat.h"
@@ -61,12 +63,14 @@ binding::TcpConnection ConnectionOf(const http::Request& request) {
 
 // Cookie and session come first: nobody without a session may cost more than a short request.
 Call ReadCall(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
+    const bool is_forwarded = TakeForwarded(request, service.installation);
     Call call{.request = request,
               .api = {},
               .method = {},
               .parameters = ReadQuery(request),
               .cookies = ReadCookies(request),
               .login = {},
+              .is_forwarded = is_forwarded,
               .context = binding::RequestContext::Current(),
               .slots = slots,
               .slot = slot,
@@ -146,8 +150,8 @@ std::string RunModule(EntryFunction entry, const Call& call) {
     throw Failure(502, "the handler gave no answer");
 }
 
-// The store's refusals of a change become failures that the caller is told.
-std::string RunMethod(const OwnApi& api, const Call& call) {
+// Throws Failure for what this method does not take, and for who may not use it.
+const Method& RequireMethod(const OwnApi& api, const Call& call) {
     const Method& method = api.Find(call.version, call.method);
     control::SlotTable::SetCall(call.slot, call.api + '/' + call.method);
     if (method.accepts == Method::Accepts::kPostOnly && call.request.Header("REQUEST_METHOD") != "POST") {
@@ -156,6 +160,11 @@ std::string RunMethod(const OwnApi& api, const Call& call) {
     if (method.audience == Method::Audience::kManagers && !binding::IsManager()) {
         throw Failure(403, kManagersOnly);
     }
+    return method;
+}
+
+// The store's refusals of a change become failures that the caller is told.
+std::string RunMethod(const Method& method, const Call& call) {
     try {
         return method.serve(call);
     } catch (const store::InvalidRecord& error) {
@@ -195,8 +204,12 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     if (IsPictureUpload(call)) {
         ForgetCookies(request, call);
     }
-    if (own != nullptr) {
-        return RunMethod(*own, call);
+    const Method* method = own == nullptr ? nullptr : &RequireMethod(*own, call);
+    if (IsServedElsewhere(call)) {
+        return "";
+    }
+    if (method != nullptr) {
+        return RunMethod(*method, call);
     }
     if (call.login && IsPlayer(call)) {
         PreparePlayer(call);

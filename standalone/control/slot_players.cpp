@@ -37,6 +37,24 @@ std::optional<RequestRef> SlotTable::FindPlayer(std::string_view session, std::i
     return found;
 }
 
+void SlotTable::NoteForwardedPlayer(Slot& slot, std::int64_t key, int host) {
+    slot.forwarded_from = host;
+    slot.forwarded_key = key;
+}
+
+int SlotTable::FindForwardedPlayer(std::string_view session, std::int64_t key) const {
+    int host = 0;
+    std::uint64_t newest = 0;
+    for (const Slot& slot : Used()) {
+        const std::uint64_t serial = slot.serial;
+        if (serial > newest && slot.forwarded_key == key && SessionOf(slot) == session && !slot.MustEnd()) {
+            host = slot.forwarded_from;
+            newest = serial;
+        }
+    }
+    return host;
+}
+
 std::uint64_t SlotTable::PackPause(std::uint64_t serial, const Pause& pause) {
     const auto rate = static_cast<std::uint8_t>(pause.resumed_rate);
     return serial << kSerialShift | std::uint64_t{rate} << 1 | (pause.on ? 1U : 0U);

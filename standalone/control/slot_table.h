@@ -91,6 +91,8 @@ struct alignas(kSlotBytes) Slot {
     std::array<char, 64> call;
     std::atomic<int> status;  // of the answer, once it is known
     Player player;
+    std::atomic<std::int64_t> forwarded_key;  // of the player whose stream it passes on; 0: none
+    std::atomic<int> forwarded_from;          // the host where that player runs
 
     bool MustEnd() const { return ended == serial; }
 };
@@ -159,6 +161,10 @@ class SlotTable {
     void BeginPlayer(Slot& slot, std::int64_t key);
     // The session's newest player under the key, which may still be opening its recording, but not one that must end.
     std::optional<RequestRef> FindPlayer(std::string_view session, std::int64_t key) const;
+    // For a request process: it passes on the stream of a player that runs at that host. And of the session's newest such
+    // request, the host; 0: none.
+    static void NoteForwardedPlayer(Slot& slot, std::int64_t key, int host);
+    int FindForwardedPlayer(std::string_view session, std::int64_t key) const;
     // Held by requests while they change more than one thing of a player, whose rate is in its progress file and whose
     // pause is in its slot. Null after a second.
     SharedLock LockPlayers() const;

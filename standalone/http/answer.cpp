@@ -11,7 +11,9 @@ namespace lookhaven::http {
 namespace {
 
 const char* Reason(int status) {
-    constexpr std::array<std::pair<int, const char*>, 15> kReasons{{{200, "OK"},
+    constexpr std::array<std::pair<int, const char*>, 17> kReasons{{{200, "OK"},
+                                                                    {302, "Found"},
+                                                                    {304, "Not Modified"},
                                                                     {400, "Bad Request"},
                                                                     {401, "Unauthorized"},
                                                                     {403, "Forbidden"},
@@ -36,9 +38,12 @@ const char* Reason(int status) {
 
 }  // namespace
 
+std::string StatusLine(int status) {
+    return "Status: " + std::to_string(status) + ' ' + Reason(status) + "\r\n";
+}
+
 std::string JsonHead(int status, std::size_t body_bytes, const std::string& extra) {
-    return "Status: " + std::to_string(status) + ' ' + Reason(status) +
-           "\r\nContent-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
+    return StatusLine(status) + "Content-Type: application/json\r\nCache-Control: no-store\r\nContent-Length: " +
            std::to_string(body_bytes) + "\r\n" + extra + "\r\n";
 }
 

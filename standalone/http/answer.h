@@ -31,6 +31,9 @@ class Failure : public std::runtime_error {
     std::string data_;
 };
 
+// "Status: 404 Not Found" and the end of the line.
+std::string StatusLine(int status);
+
 // The head of an answer with a body of JSON. extra: further header lines, each ending in CR LF.
 std::string JsonHead(int status, std::size_t body_bytes, const std::string& extra = "");
 

@@ -1,0 +1,188 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/elsewhere.h"
+
+#include <optional>
+#include <set>
+#include <string>
+
+#include "platform/admission/pairauth.h"
+#include "standalone/api/export.h"
+#include "standalone/api/footage.h"
+#include "standalone/api/forward.h"
+#include "standalone/api/own_apis.h"
+#include "standalone/api/player.h"
+#include "standalone/binding/rights.h"
+#include "standalone/store/hosts.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
+
+// What a call needs that one host has alone.
+struct Place {
+    int host_id = 0;  // 0: any
+    Forwarded kind = Forwarded::kFootage;
+    std::string what;
+};
+
+// 0 for what is no number; the handler says what is wrong with it.
+int IdOf(const Call& call, const char* name) {
+    const Json::Value& value = call.Parameter(name);
+    return value.isInt() ? value.asInt() : 0;
+}
+
+bool IsLive(const Call& call) {
+    const bool shows_camera = IdOf(call, "itemType") == 0 || IdOf(call, "snapshot") == 1;
+    return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get");
+}
+
+// A paired host has no session; whoever is neither is refused by this host's handler.
+bool IsAdmitted(const Call& call) {
+    const auto timestamp = call.cookies.find("timestamp");
+    return call.login || (timestamp != call.cookies.end() && call.Parameter("cookie").isString() &&
+                          IsAuthPairMatch(call.Parameter("cookie").asString(), timestamp->second));
+}
+
+// The host that records the camera, else the one that is to.
+int HostOfCamera(store::Store& records, int camera_id) {
+    const int recording = store::Hosts(records).HostOfCamera(camera_id);
+    const auto camera = recording == 0 ? store::Cameras(records).Find(camera_id) : std::nullopt;
+    return camera ? camera->host_id : recording;
+}
+
+Place PlaceOfLive(const Call& call, int own_host) {
+    const int camera = IdOf(call, "camera");
+    const int host = camera > 0 ? HostOfCamera(call.Records(), camera) : 0;
+    const bool is_for_caller =
+        host != 0 && host != own_host && IsAdmitted(call) && binding::MayUse(camera, store::CameraAccess::kLive);
+    return {is_for_caller ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
+}
+
+// The event that a player of the module plays, by the names that its methods have for it.
+std::optional<Footage> FootageOfPlayer(const Call& call) {
+    const bool by_frames = call.method == "PlayMjpegEvent";
+    const int kind = !by_frames                                            ? 0
+                     : IdOf(call, "recEvtType") != 0                       ? IdOf(call, "recEvtType")
+                     : call.Parameter("blAnalyEvent") == Json::Value(true) ? static_cast<int>(store::MarkKind::kAlert)
+                                                                           : 0;
+    return FindFootage(call.Records(), kind == 0 ? std::nullopt : std::optional(static_cast<store::MarkKind>(kind)),
+                       IdOf(call, "eventid"));
+}
+
+std::optional<Footage> FootageOf(const Call& call) {
+    if (IsPlayer(call)) {
+        return FootageOfPlayer(call);
+    }
+    const bool by_time = call.method == "At" || call.method == "Stream";
+    return by_time ? FindRequestedFootage(call)
+                   : FindFootage(call.Records(), KindOf(call), call.Parameter("event").asInt());
+}
+
+Place PlaceOfFootage(const Call& call) {
+    const std::optional<Footage> footage = FootageOf(call);
+    const auto access = call.method == "Download" ? store::CameraAccess::kExport : store::CameraAccess::kPlayback;
+    if (!footage || !binding::MayUse(footage->camera_id, access)) {
+        return {};
+    }
+    return {store::Hosts(call.Records()).HostOfMount(footage->mount_id), Forwarded::kFootage,
+            "this footage of camera " + std::to_string(footage->camera_id)};
+}
+
+std::string NameOfHost(store::Store& records, int id) {
+    const auto host = store::Hosts(records).Find(id);
+    return host ? host->name : "that was removed";
+}
+
+// One file is made by one host: of all that is asked for.
+Place PlaceOfExport(const Call& call) {
+    std::set<int> hosts;
+    for (const int mount : MountsOfExport(call)) {
+        hosts.insert(store::Hosts(call.Records()).HostOfMount(mount));
+    }
+    hosts.erase(0);
+    if (hosts.size() <= 1) {
+        return {hosts.empty() ? 0 : *hosts.begin(), Forwarded::kFootage, "this footage"};
+    }
+    std::string names;
+    for (const int id : hosts) {
+        names += (names.empty() ? "" : ", ") + NameOfHost(call.Records(), id);
+    }
+    throw Failure(409, "this footage lies on several hosts (" + names + "): export what each of them has by itself");
+}
+
+Place PlaceOf(const Call& call, int own_host) {
+    const bool is_event = call.api == kEventApi.name;
+    if (IsLive(call)) {
+        return PlaceOfLive(call, own_host);
+    }
+    if (is_event && (call.method == "Export" || call.method == "PlanExport")) {
+        return PlaceOfExport(call);
+    }
+    const bool needs_footage =
+        IsPlayer(call) || (call.api == kPictureApi.name && call.method == "At") ||
+        (is_event && (call.method == "Frame" || call.method == "Download" || call.method == "Stream"));
+    return needs_footage ? PlaceOfFootage(call) : Place();
+}
+
+// What steers the player at whichever host it runs, now.
+bool IsControlledElsewhere(const Call& call, int own_host) {
+    const Json::Value& key = call.Parameter("timestamp");
+    if (!key.isInt64() || key.asInt64() < 1 || call.is_forwarded ||
+        call.slots.FindPlayer(call.context.Session(), key.asInt64())) {
+        return false;
+    }
+    const int known = call.slots.FindForwardedPlayer(call.context.Session(), key.asInt64());
+    // Where another host passes the player's stream on, this one does not know where it runs.
+    for (const store::Host& host : store::Hosts(call.Records()).All()) {
+        if (known != 0 ? host.id != known : host.id == own_host) {
+            continue;
+        }
+        try {
+            if (Forward(call, host, Forwarded::kControl, "the player")) {
+                return true;
+            }
+        } catch (const Failure&) {
+            if (known != 0) {
+                throw;
+            }
+        }
+    }
+    return false;
+}
+
+}  // namespace
+
+bool IsServedElsewhere(const Call& call) {
+    const bool steers_player = call.api == kPlaybackApi.name;
+    if (!steers_player && !IsLive(call) && !IsPlayer(call) && call.api != kPictureApi.name &&
+        call.api != kEventApi.name) {
+        return false;
+    }
+    const int own_host = call.context.Installation().HostId();
+    if (own_host == 0) {
+        return false;
+    }
+    if (steers_player) {
+        return IsControlledElsewhere(call, own_host);
+    }
+    const Place place = PlaceOf(call, own_host);
+    if (place.host_id == 0 || place.host_id == own_host) {
+        return false;
+    }
+    const auto host = store::Hosts(call.Records()).Find(place.host_id);
+    if (!host) {
+        throw Failure(503, place.what + " is on a host that was removed from this installation");
+    }
+    if (call.is_forwarded) {
+        throw Failure(503, place.what + " is on host " + host->name + " by now", http::kRetrySoonSeconds);
+    }
+    if (IsPlayer(call) || (call.api == kEventApi.name && call.method == "Stream")) {
+        control::SlotTable::NoteForwardedPlayer(call.slot, call.NumberOr("timestamp", 0), host->id);
+    }
+    Forward(call, *host, place.kind, place.what);
+    return true;
+}
+
+}  // namespace lookhaven::api

@@ -1,0 +1,167 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/forward.h"
+
+#include <algorithm>
+#include <array>
+#include <chrono>
+
+#include <poll.h>
+#include <unistd.h>
+
+#include "standalone/api/admit.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/binding/compact_json.h"
+#include "standalone/remote/forward.h"
+#include "standalone/remote/forward_token.h"
+#include "standalone/store/sessions.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr const char* kTokenHeader = "HTTP_X_LOOKHAVEN_FORWARDED";
+constexpr std::string_view kTokenLine = "X-Lookhaven-Forwarded: ";
+constexpr std::chrono::seconds kMaxSilentLive{60};
+// What lies in buffers of a viewer who cannot keep up is old.
+constexpr int kLiveReceiveBytes = 64 << 10;
+constexpr std::size_t kMaxTagBytes = 100;
+constexpr int kBadGateway = 502;
+
+bool IsPrintable(std::string_view text) {
+    return std::ranges::all_of(text, [](char character) { return character >= ' ' && character <= '~'; });
+}
+
+// The cookies that admit the caller, under the names that they have over HTTPS.
+std::string CookiesOf(const Call& call) {
+    if (call.login) {
+        return "__Host-id=" + call.cookies.at(SessionCookie(call.request));
+    }
+    const auto timestamp = call.cookies.find("timestamp");
+    return timestamp == call.cookies.end() ? "" : "timestamp=" + timestamp->second;
+}
+
+remote::ForwardedRequest RequestOf(const Call& call, const store::Host& host, Forwarded kind) {
+    remote::ForwardedRequest request;
+    request.query = "api=" + call.api + "&version=" + std::to_string(call.version) + "&method=" + call.method;
+    const std::string key = store::Sessions(call.Records()).Key();
+    request.headers.push_back(std::string(kTokenLine) + remote::MakeForwardToken(key, host.id,
+                                                                                 call.request.Header("REMOTE_ADDR"),
+                                                                                 base::WallSeconds()));
+    request.headers.push_back("Cookie: " + CookiesOf(call));
+    const std::string_view tag = call.request.Header("HTTP_IF_NONE_MATCH");
+    if (!tag.empty() && tag.size() <= kMaxTagBytes && IsPrintable(tag)) {
+        request.headers.push_back("If-None-Match: " + std::string(tag));
+    }
+    Json::Value parameters(Json::objectValue);
+    for (const auto& [name, value] : call.parameters) {
+        if (name != "api" && name != "version" && name != "method") {
+            parameters[name] = value;
+        }
+    }
+    binding::AppendCompactJson(request.json, parameters);
+    if (kind == Forwarded::kLive) {
+        request.max_silent = kMaxSilentLive;
+        request.receive_bytes = kLiveReceiveBytes;
+    }
+    return request;
+}
+
+class Passage : public remote::AnswerSink {
+  public:
+    Passage(const Call& call, Forwarded kind) : call_(call), output_(*call.context.output()), kind_(kind) {}
+
+    bool Begin(const remote::AnswerHead& head) override {
+        status_ = head.status;
+        if (IsWithheld()) {
+            return false;
+        }
+        if (!head.content_type.starts_with("image/") && !head.content_type.starts_with("application/json")) {
+            call_.context.NoteStream();
+        }
+        call_.slot.status = head.status;
+        std::string lines = http::StatusLine(head.status);
+        const auto add = [&lines](std::string_view name, std::string_view value) {
+            lines.append(name).append(": ").append(value).append("\r\n");
+        };
+        for (const auto& [name, value] : head.headers) {
+            add(name, value);
+        }
+        if (!head.content_type.empty()) {
+            add("Content-Type", head.content_type);
+        }
+        if (!head.location.empty()) {
+            add("Location", head.location);
+        }
+        if (head.size_bytes >= 0) {
+            add("Content-Length", std::to_string(head.size_bytes));
+        }
+        return Send(lines.append("\r\n"));
+    }
+
+    bool Write(std::span<const char> bytes) override { return Send(bytes); }
+
+    // A viewer who has gone shows only where something is sent.
+    bool GoesOn() override {
+        pollfd viewer{STDOUT_FILENO, POLLRDHUP, 0};
+        return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
+    }
+
+    // What the web server there says while its host is away.
+    bool IsFromNobody() const { return status_ == kBadGateway; }
+    bool IsWithheld() const { return IsFromNobody() || (kind_ == Forwarded::kControl && status_ == 404); }
+
+  private:
+    bool Send(std::span<const char> bytes) {
+        iovec piece{const_cast<char*>(bytes.data()), bytes.size()};
+        return output_.Send({&piece, 1});
+    }
+
+    const Call& call_;
+    binding::Output& output_;
+    const Forwarded kind_;
+    int status_ = 0;
+};
+
+Failure Away(const store::Host& host, const std::string& what, const std::string& why) {
+    base::LogWarning("host " + host.name + " does not answer a request that is passed on to it: " + why);
+    return Failure(503, what + " is on host " + host.name + ", which is away", http::kRetrySoonSeconds);
+}
+
+}  // namespace
+
+bool TakeForwarded(http::Request& request, const base::Installation& installation) {
+    const auto token = request.headers.find(kTokenHeader);
+    const int own_host = token == request.headers.end() ? 0 : installation.HostId();
+    if (own_host == 0) {
+        return false;
+    }
+    const std::optional<std::string> client =
+        remote::ClientInForwardToken(token->second, store::Sessions(binding::RequestContext::Current().Records()).Key(),
+                                     own_host, base::WallSeconds());
+    if (!client) {
+        throw Failure(403, "no host of this installation has passed this request on, or its clock is more than five"
+                           " minutes off");
+    }
+    request.headers["REMOTE_ADDR"] = *client;
+    return true;
+}
+
+bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what) {
+    const remote::ForwardedRequest request = RequestOf(call, host, kind);
+    call.context.CloseRecords();
+    Passage passage(call, kind);
+    try {
+        remote::Forward({host.address, host.port, host.certificate}, request, passage);
+    } catch (const remote::WrongCertificate&) {
+        throw Away(host, what, "it shows another certificate than the one it was added with, or an expired one");
+    } catch (const std::runtime_error& error) {
+        throw Away(host, what, error.what());
+    }
+    if (passage.IsFromNobody()) {
+        throw Away(host, what, "only its web server runs");
+    }
+    return !passage.IsWithheld();
+}
+
+}  // namespace lookhaven::api

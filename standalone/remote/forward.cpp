@@ -1,0 +1,177 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// In the shared library liblookhaven-remote.so: one forwarded request.
+#include "standalone/remote/forward.h"
+
+#include <algorithm>
+#include <string_view>
+
+#include <netinet/in.h>
+#include <netinet/tcp.h>
+#include <sys/socket.h>
+
+#include "standalone/remote/pinned_handle.h"
+
+namespace lookhaven::remote {
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+constexpr long kConnectMillis = 3'000;
+// Less than the host gives a request process for its answer.
+constexpr std::chrono::seconds kMaxHeadWait{28};
+constexpr long kKeepAliveSeconds = 5;
+constexpr unsigned int kMaxUnansweredMillis = 20'000;
+constexpr std::size_t kMaxHeaderBytes = 1'000;
+constexpr const char* kPassedOn[] = {"Cache-Control", "Content-Disposition", "ETag", "Retry-After",
+                                     "Vary",          "X-Capture-Time"};
+constexpr int kFound = 302;
+constexpr int kNotModified = 304;
+
+bool IsPlain(std::string_view text) {
+    return text.size() <= kMaxHeaderBytes &&
+           std::ranges::all_of(text, [](char character) { return character >= ' ' && character <= '~'; });
+}
+
+// Without scheme and host, which the web server there may have put in front.
+std::string PathOf(std::string_view location) {
+    if (const std::size_t scheme_end = location.find("://"); scheme_end != location.npos) {
+        location.remove_prefix(std::min(location.find('/', scheme_end + 3), location.size()));
+    }
+    // "//name" would lead to another host, and what is no path anywhere.
+    const bool is_path =
+        location.starts_with('/') && !location.starts_with("//") && location.find('\\') == location.npos;
+    return is_path && IsPlain(location) ? std::string(location) : "";
+}
+
+class Passage {
+  public:
+    Passage(const Host& host, const ForwardedRequest& request, AnswerSink& sink)
+        : sink_(sink),
+          receive_bytes_(request.receive_bytes),
+          handle_(host, request.query, LinesOf(request)) {
+        handle_.Set(CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.json.size()));
+        handle_.Set(CURLOPT_COPYPOSTFIELDS, request.json.data());
+        handle_.Set(CURLOPT_CONNECTTIMEOUT_MS, kConnectMillis);
+        handle_.Set(CURLOPT_LOW_SPEED_LIMIT, request.max_silent.count() > 0 ? 1L : 0L);
+        handle_.Set(CURLOPT_LOW_SPEED_TIME, static_cast<long>(request.max_silent.count()));
+        handle_.Set(CURLOPT_TCP_KEEPALIVE, 1L);
+        handle_.Set(CURLOPT_TCP_KEEPIDLE, kKeepAliveSeconds);
+        handle_.Set(CURLOPT_TCP_KEEPINTVL, kKeepAliveSeconds);
+        handle_.Set(CURLOPT_SOCKOPTFUNCTION, &Passage::OnSocket);
+        handle_.Set(CURLOPT_SOCKOPTDATA, this);
+        handle_.Set(CURLOPT_WRITEFUNCTION, &Passage::OnBytes);
+        handle_.Set(CURLOPT_WRITEDATA, this);
+        handle_.Set(CURLOPT_NOPROGRESS, 0L);
+        handle_.Set(CURLOPT_XFERINFOFUNCTION, &Passage::OnProgress);
+        handle_.Set(CURLOPT_XFERINFODATA, this);
+    }
+
+    bool Run() {
+        const CURLcode result = handle_.Perform();
+        if (result == CURLE_OK && !has_begun_) {
+            Begin();
+        }
+        if (!has_begun_) {
+            if (is_late_) {
+                throw NoAnswer("it does not answer in time");
+            }
+            if (!problem_.empty()) {
+                throw NoAnswer(problem_);
+            }
+            if (!is_ended_by_sink_) {
+                handle_.ThrowNoAnswer(result);
+            }
+        }
+        return result == CURLE_OK && !is_ended_by_sink_;
+    }
+
+  private:
+    static std::vector<std::string> LinesOf(const ForwardedRequest& request) {
+        std::vector<std::string> lines = request.headers;
+        lines.insert(lines.end(), {"Content-Type: application/json", "Expect:"});
+        return lines;
+    }
+
+    AnswerHead Head() const {
+        const long status = handle_.Status();
+        const bool is_redirect = status >= 300 && status != kNotModified;
+        if (status < 200 || status > 599 || (is_redirect && status < 400 && status != kFound)) {
+            throw NoAnswer("it answers with status " + std::to_string(status), status);
+        }
+        AnswerHead head;
+        head.status = static_cast<int>(status);
+        head.size_bytes = handle_.SizeBytes();
+        if (const std::string type = handle_.ContentType(); IsPlain(type)) {
+            head.content_type = type;
+        }
+        for (const char* name : kPassedOn) {
+            if (std::string value = handle_.Header(name); !value.empty() && IsPlain(value)) {
+                head.headers.emplace_back(name, std::move(value));
+            }
+        }
+        if (status == kFound) {
+            head.location = PathOf(handle_.Header("Location"));
+        }
+        return head;
+    }
+
+    void Begin() {
+        const AnswerHead head = Head();
+        has_begun_ = true;
+        is_ended_by_sink_ = !sink_.Begin(head);
+    }
+
+    bool Take(std::span<const char> bytes) {
+        if (!has_begun_) {
+            Begin();
+        }
+        is_ended_by_sink_ = is_ended_by_sink_ || !sink_.Write(bytes);
+        return !is_ended_by_sink_;
+    }
+
+    // No exception may pass through libcurl.
+    static std::size_t OnBytes(char* bytes, std::size_t size, std::size_t count, void* self) {
+        Passage& passage = *static_cast<Passage*>(self);
+        try {
+            return passage.Take({bytes, size * count}) ? size * count : CURL_WRITEFUNC_ERROR;
+        } catch (const std::exception& error) {
+            passage.problem_ = error.what();
+            return CURL_WRITEFUNC_ERROR;
+        }
+    }
+
+    static int OnProgress(void* self, curl_off_t, curl_off_t, curl_off_t, curl_off_t) {
+        Passage& passage = *static_cast<Passage*>(self);
+        passage.is_late_ = !passage.has_begun_ && Clock::now() - passage.began_ > kMaxHeadWait;
+        passage.is_ended_by_sink_ = passage.is_ended_by_sink_ || !passage.sink_.GoesOn();
+        return passage.is_late_ || passage.is_ended_by_sink_ ? 1 : 0;
+    }
+
+    static int OnSocket(void* self, curl_socket_t socket, curlsocktype) {
+        ::setsockopt(socket, IPPROTO_TCP, TCP_USER_TIMEOUT, &kMaxUnansweredMillis, sizeof kMaxUnansweredMillis);
+        if (const int bytes = static_cast<Passage*>(self)->receive_bytes_; bytes > 0) {
+            ::setsockopt(socket, SOL_SOCKET, SO_RCVBUF, &bytes, sizeof bytes);
+        }
+        return CURL_SOCKOPT_OK;
+    }
+
+    AnswerSink& sink_;
+    const int receive_bytes_;
+    const Clock::time_point began_ = Clock::now();
+    std::string problem_;
+    bool is_late_ = false;
+    bool has_begun_ = false;
+    bool is_ended_by_sink_ = false;
+    PinnedHandle handle_;
+};
+
+}  // namespace
+
+}  // namespace lookhaven::remote
+
+bool LookhavenForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
+                      lookhaven::remote::AnswerSink& sink) {
+    return lookhaven::remote::Passage(host, request, sink).Run();
+}

@@ -1,0 +1,59 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Has another host that shares this one's store answer a request, and takes its answer as it comes.
+//
+// Invariants    (1) Of the answer's headers only those that say what its body is, for how long it may be kept, and when
+//                   to ask again are told; each is printable ASCII of bounded length. None may set a cookie, or steer
+//                   the web server or the browser.
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <span>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "standalone/remote/fetch.h"
+
+namespace lookhaven::remote {
+
+struct ForwardedRequest {
+    std::string query;                  // without '?'
+    std::vector<std::string> headers;   // "Name: value" each
+    std::string json;                   // the body
+    std::chrono::seconds max_silent{};  // without a byte from that host; 0: for as long as the connection stands
+    int receive_bytes = 0;              // of the connection's buffer; 0: as many as are good for it
+};
+
+struct AnswerHead {
+    int status = 0;
+    std::string content_type;  // empty: none
+    std::vector<std::pair<std::string, std::string>> headers;
+    std::string location;          // the path of a redirect on that host; empty: none
+    std::int64_t size_bytes = -1;  // of the body; -1: not known
+};
+
+// Takes an answer as it comes. What returns false ends it.
+class AnswerSink {
+  public:
+    virtual ~AnswerSink() = default;
+
+    // Once, also for an answer without a body.
+    virtual bool Begin(const AnswerHead& head) = 0;
+    virtual bool Write(std::span<const char> bytes) = 0;
+    // Asked at least once a second, also while nothing comes.
+    virtual bool GoesOn() = 0;
+};
+
+// Returns when the answer has ended or the sink has ended it: whether the whole answer came. Throws NoAnswer when none
+// began, after three seconds where there is no such host and after 28 where it says nothing; WrongCertificate;
+// InvalidCertificate; and std::runtime_error when the library cannot be loaded.
+bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);
+
+}  // namespace lookhaven::remote
+
+// What the shared library gives to forward_loader.cpp, which alone calls it.
+extern "C" __attribute__((visibility("default"))) bool
+LookhavenForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
+                 lookhaven::remote::AnswerSink& sink);

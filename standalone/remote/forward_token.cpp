@@ -1,0 +1,66 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/remote/forward_token.h"
+
+#include <array>
+#include <charconv>
+#include <stdexcept>
+
+#include <sodium.h>
+
+#include "standalone/base/text.h"
+
+namespace lookhaven::remote {
+
+namespace {
+
+constexpr std::string_view kLabel = "lookhaven forward 1\n";
+constexpr std::size_t kKeyDigits = 2 * crypto_auth_hmacsha256_KEYBYTES;
+constexpr std::size_t kCodeDigits = 2 * crypto_auth_hmacsha256_BYTES;
+constexpr std::size_t kMaxTokenBytes = 200;
+constexpr std::int64_t kMaxSeconds = 999'999'999'999;
+
+std::string CodeOf(std::string_view key, int to_host, std::string_view said) {
+    if (!base::IsHex(key, kKeyDigits)) {
+        throw std::invalid_argument("the key of hosts that share a store is 64 hexadecimal digits");
+    }
+    std::array<unsigned char, crypto_auth_hmacsha256_KEYBYTES> bytes{};
+    sodium_hex2bin(bytes.data(), bytes.size(), key.data(), key.size(), nullptr, nullptr, nullptr);
+    const std::string message = std::string(kLabel).append(std::to_string(to_host)).append(1, '\n').append(said);
+    std::array<unsigned char, crypto_auth_hmacsha256_BYTES> code{};
+    crypto_auth_hmacsha256(code.data(), reinterpret_cast<const unsigned char*>(message.data()), message.size(),
+                           bytes.data());
+    return base::ToHex(code);
+}
+
+bool IsWithinWindow(std::string_view timestamp, std::int64_t now_s) {
+    std::int64_t seconds = 0;
+    const char* const end = timestamp.data() + timestamp.size();
+    const auto [rest, error] = std::from_chars(timestamp.data(), end, seconds);
+    return error == std::errc() && rest == end && seconds >= 0 && seconds <= kMaxSeconds &&
+           seconds >= now_s - kForwardTokenWindowSeconds && seconds <= now_s + kForwardTokenWindowSeconds;
+}
+
+}  // namespace
+
+std::string MakeForwardToken(std::string_view key, int to_host, std::string_view client, std::int64_t now_s) {
+    std::string said = std::to_string(now_s).append(1, ' ').append(client).append(1, ' ');
+    return said.append(CodeOf(key, to_host, said));
+}
+
+std::optional<std::string> ClientInForwardToken(std::string_view token, std::string_view key, int own_host,
+                                                std::int64_t now_s) {
+    if (token.size() > kMaxTokenBytes || token.size() <= kCodeDigits || !base::IsHex(key, kKeyDigits)) {
+        return std::nullopt;
+    }
+    const std::string_view said = token.substr(0, token.size() - kCodeDigits);
+    const std::string code = CodeOf(key, own_host, said);
+    if (sodium_memcmp(code.data(), token.data() + said.size(), kCodeDigits) != 0) {
+        return std::nullopt;
+    }
+    // Made by the key, hence of this form.
+    const std::size_t space = said.find(' ');
+    const std::string_view client = said.substr(space + 1, said.size() - space - 2);
+    return IsWithinWindow(said.substr(0, space), now_s) ? std::optional(std::string(client)) : std::nullopt;
+}
+
+}  // namespace lookhaven::remote
