@@ -3,8 +3,8 @@
 // Which calls another host of the same store has to answer: for a camera's picture the host that records it, for
 // footage the one that has its mount, for a player the one where it runs.
 //
-// Why so        Sessions, rights, searches and settings come from the store, so every host answers them. Rings and files
-//               are one host's alone.
+// Why so        Sessions, rights, searches and settings come from the store, so every host answers them. Rings and
+//               files are one host's alone.
 #pragma once
 
 #include "standalone/api/call.h"

@@ -2,9 +2,10 @@
 //
 // Passes a call on to another host of the same store, and that host's answer back.
 //
-// Why so        Both hosts have the same accounts, sessions and rights. So the call goes with the caller's own session,
-//               and the other host judges it as if the caller had asked it at first: passing on widens nothing. It is
-//               written anew from what was read of it, never copied, so the two cannot read it differently.
+// Why so        Both hosts have the same accounts, sessions and rights. So the call goes with the caller's own
+//               session, and the other host judges it as if the caller had asked it at first: passing on widens
+//               nothing. It is written anew from what was read of it, never copied, so the two cannot read it
+//               differently.
 // Invariants    (1) A call that was passed on once is never passed on again, whoever says that it was.
 #pragma once
 
@@ -16,8 +17,8 @@
 
 namespace lookhaven::api {
 
-// Whether another host has passed the request on; its address is the client's then. Throws Failure 403 where the request
-// says so, and it is not so; store::StoreError.
+// Whether another host has passed the request on; its address is the client's then. Throws Failure 403 where the
+// request says so, and it is not so; store::StoreError.
 bool TakeForwarded(http::Request& request, const base::Installation& installation);
 
 // What is passed on.

@@ -3,11 +3,13 @@
 // Which cameras a host takes and gives away, decided by each host for itself from what all of them see.
 //
 // Why so        There is no host that decides for the others, and so none to lose. Every host shares the free cameras
-//               out among all hosts in the same way, and takes its own part; where two see the store a moment apart, the
-//               lease goes to one of them (store/camera_leases.h).
+//               out among all hosts in the same way, and takes its own part; where two see the store a moment apart,
+//               the lease goes to one of them (store/camera_leases.h).
 // Invariants    (1) A camera that is fixed to a host is taken by that host alone.
-//               (2) Nothing is given away that nobody is there to take: recording by the wrong host is better than none.
-//               (3) A floating camera moves when its holder is away, drains, or an owner moved it, and never otherwise.
+//               (2) Nothing is given away that nobody is there to take: recording by the wrong host is better than
+//                   none.
+//               (3) A floating camera moves when its holder is away, drains, or an owner moved it, and never
+//                   otherwise.
 #pragma once
 
 #include <cstdint>
@@ -22,8 +24,8 @@ namespace lookhaven::recorder {
 // Which hosts are away, by this process's own clock.
 //
 // Why so        While the store is away from everybody no heartbeat changes, and the one that reaches it first
-//               afterwards must not take everybody else for silent. So only time through which this process itself saw
-//               the store counts.
+//               afterwards must not take everybody else for silent. So only time through which this process itself
+//               saw the store counts.
 class HostWatch {
   public:
     // away_us: how long a heartbeat stands still until its host counts as away.

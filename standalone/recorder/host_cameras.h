@@ -2,11 +2,12 @@
 //
 // The cameras that this host records, where several share the store: takes, keeps and gives up their leases.
 //
-// Why so        A store that is away from everybody must stop recording nowhere, and a host that alone is cut off cannot
-//               tell the two apart. So a host keeps what it held when it last reached the store. Once its heartbeat has
-//               stood still for long enough, the others take its floating cameras over, and then two record them, until
-//               it reaches the store again and learns within two seconds what it has lost: footage twice, whose ids are
-//               of each host's own block, rather than none. A camera that is fixed to its host is never recorded twice.
+// Why so        A store that is away from everybody must stop recording nowhere, and a host that alone is cut off
+//               cannot tell the two apart. So a host keeps what it held when it last reached the store. Once its
+//               heartbeat has stood still for long enough, the others take its floating cameras over, and then two
+//               record them, until it reaches the store again and learns within two seconds what it has lost: footage
+//               twice, whose ids are of each host's own block, rather than none. A camera that is fixed to its host
+//               is never recorded twice.
 // Invariants    (1) A lease is given up only when the recording has ended and its rows are stored.
 //               (2) Nothing is held before the store says so: a new process begins without cameras.
 // Thread safety Any thread; nothing here waits for the store.

@@ -2,9 +2,9 @@
 //
 // Which host of store/hosts.h records which camera: a lease each, of one host at any time.
 //
-// Why so        A thousand leases that are renewed every few seconds would keep the store busy, so a lease lasts as long
-//               as its host's heartbeat changes. Who takes it from a silent host does so only while that heartbeat is
-//               still the one that stood still, which is judged under the lock of the host's row.
+// Why so        A thousand leases that are renewed every few seconds would keep the store busy, so a lease lasts as
+//               long as its host's heartbeat changes. Who takes it from a silent host does so only while that
+//               heartbeat is still the one that stood still, which is judged under the lock of the host's row.
 // Invariants    (1) A lease changes hands when its holder gave it up, is silent, or was removed, and never otherwise.
 //               (2) Its count grows with each change, so that nobody takes what has changed since it looked.
 #pragma once
@@ -40,7 +40,8 @@ class CameraLeases {
     bool Take(const CameraLease& seen, int host, std::int64_t silent_heartbeat);
     // Gives up the host's lease; does nothing when it has none of that camera.
     void Release(int camera, int host);
-    // Has the holder give the camera to that host, once it can take it. Does nothing for a camera that nobody ever had.
+    // Has the holder give the camera to that host, once it can take it. Does nothing for a camera that nobody ever
+    // had.
     void Move(int camera, int next_host);
 
   private:

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Recorders of several hosts on one store: who records which camera, also when one of them is lost, cut off, or drained.
+// Recorders of several hosts on one store: who records which camera, also when one of them is lost, cut off, or
+// drained.
 #include <algorithm>
 #include <csignal>
 #include <cstdlib>
@@ -135,7 +136,8 @@ class HostsTest : public testing::Test {
         return is_so;
     }
 
-    // Of each camera, the recordings of different hosts follow one another, but for the second that ends are rounded to.
+    // Of each camera, the recordings of different hosts follow one another, but for the second that ends are rounded
+    // to.
     void ExpectNeverRecordedTwice() {
         std::map<int, std::vector<store::Event>> events;
         for (const auto& [camera, holder] : Holders()) {
