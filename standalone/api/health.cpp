@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <map>
 #include <optional>
+#include <set>
 
 #include <unistd.h>
 
@@ -12,6 +13,7 @@
 #include "standalone/control/stream_counters.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/store/camera_leases.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
@@ -35,11 +37,29 @@ void CheckStreams(const std::vector<control::StreamCounters>& streams, Problems&
     }
 }
 
+// The cameras that other hosts of the store record, or that wait for them.
+std::set<int> CamerasOfOthers(store::Store& records, int host) {
+    std::set<int> cameras;
+    for (const store::CameraLease& lease :
+         host == 0 ? std::vector<store::CameraLease>() : store::CameraLeases(records).List()) {
+        const int holder = lease.host_id != 0 ? lease.host_id : lease.fixed_host_id;
+        if (holder != 0 && holder != host) {
+            cameras.insert(lease.camera_id);
+        }
+    }
+    return cameras;
+}
+
 // Those that are to be recorded always, and that the recorder does not even try.
-void CheckCameras(store::Store& records, const std::vector<control::StreamCounters>& streams, Problems& problems) {
+void CheckCameras(store::Store& records, int host, const std::vector<control::StreamCounters>& streams,
+                  Problems& problems) {
     const std::int64_t now_s = base::WallSeconds();
     const std::map<int, store::RecordingPlan> plans = store::RecordingPlans(records).List();
+    const std::set<int> of_others = CamerasOfOthers(records, host);
     for (const store::Camera& camera : store::Cameras(records).List()) {
+        if (of_others.contains(camera.id)) {
+            continue;
+        }
         const auto plan = plans.find(camera.id);
         const bool is_recorded = std::ranges::any_of(streams, [&](const control::StreamCounters& each) {
             return each.is_recorded && each.stream.camera == camera.id;
@@ -68,7 +88,7 @@ std::optional<std::string> ProblemOf(store::Store& records, const store::Mount& 
 
 void CheckMounts(const base::Installation& installation, store::Store& records, Problems& problems) {
     for (const store::Mount& mount : store::Mounts(records).List()) {
-        if (!mount.enabled) {
+        if (!mount.enabled || !mount.IsOf(installation.HostId())) {
             continue;
         }
         std::optional<std::string> problem;
@@ -104,7 +124,7 @@ Problems FindProblems(const base::Installation& installation, store::Store* reco
     }
     try {
         if (streams) {
-            CheckCameras(*records, *streams, problems);
+            CheckCameras(*records, installation.HostId(), *streams, problems);
         }
         CheckMounts(installation, *records, problems);
     } catch (const store::StoreError&) {

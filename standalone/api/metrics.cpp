@@ -81,6 +81,9 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
     }
     std::vector<MountFigures> mounts;
     for (const store::Mount& mount : store::Mounts(records).List()) {
+        if (!mount.IsOf(installation.HostId())) {
+            continue;
+        }
         MountFigures& figures = mounts.emplace_back();
         figures.mount = mount;
         const auto oldest = store::Events(records).InRecordingOrder(mount.id, store::Event(), 1);

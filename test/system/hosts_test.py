@@ -4,9 +4,12 @@
 import contextlib
 import hashlib
 import hmac
+import json
 import sys
 import time
 import unittest
+import urllib.error
+import urllib.request
 
 from installation import LIVE, PLAYER, ROOT, Installation, call, recorded_events, wait_until
 from parts import Parts
@@ -114,6 +117,18 @@ class HostsTest(unittest.TestCase):
         self.assertEqual(passed, direct)
         for parts in streams:
             parts.close()
+
+    def test_health_and_figures_are_of_the_host_alone(self):
+        for server, is_theirs in ((self.owner, True), (self.other, False)):
+            with urllib.request.urlopen(f"http://127.0.0.1:{server.port}/metrics") as answer:
+                self.assertEqual("lookhaven_mount_up{" in answer.read().decode(), is_theirs)
+        try:
+            answer = urllib.request.urlopen(f"http://127.0.0.1:{self.other.port}/healthz")
+        except urllib.error.HTTPError as problems:  # its recorder's may be among them, which began before it was a host
+            answer = problems
+        with answer:
+            subjects = {each["subject"] for each in json.load(answer)["data"]["problem"]}
+        self.assertLessEqual(subjects, {"recorder"})
 
     def test_an_export_comes_through(self):
         span = {"cameralists": "1,2", "from": self.event["start"], "to": self.event["start"] + 10}
