@@ -247,15 +247,15 @@ constexpr const char* kHosts[] = {
     // No reference to hosts: a host that was removed leaves its footage, and cameras that wait for it.
     "alter table cameras add column host_id integer not null default 0",
     "alter table mounts add column host_id integer not null default 0",
-    "create table camera_leases (camera_id integer not null primary key references cameras (id) on delete cascade,"
-    " host_id integer not null, count bigint not null, next_host_id integer not null)",
+    ("create table camera_leases (camera_id integer not null primary key references cameras (id) on delete cascade,"
+     " host_id integer not null, count bigint not null, next_host_id integer not null)"),
 };
 constexpr const char* kMountPathsOnSqlite[] = {
     "create table mounts_of_hosts (id integer not null primary key, name text not null unique, path text not null,"
     " max_bytes bigint not null, max_age bigint not null, enabled integer not null, is_default integer not null,"
     " host_id integer not null default 0)",
-    "insert into mounts_of_hosts (id, name, path, max_bytes, max_age, enabled, is_default, host_id)"
-    " select id, name, path, max_bytes, max_age, enabled, is_default, host_id from mounts",
+    ("insert into mounts_of_hosts (id, name, path, max_bytes, max_age, enabled, is_default, host_id)"
+     " select id, name, path, max_bytes, max_age, enabled, is_default, host_id from mounts"),
     "drop table mounts",
     "alter table mounts_of_hosts rename to mounts",
 };
