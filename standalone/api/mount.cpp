@@ -25,6 +25,7 @@
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
+#include "standalone/store/hosts.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::api {
@@ -41,6 +42,7 @@ constexpr double kMaxLimitDays = 36'500;
 
 // What all mounts are described by.
 struct MountContext {
+    int host = 0;
     std::int64_t now_s = base::WallSeconds();
     std::vector<maintenance::MountStatus> states;  // as the recorder that runs sees them
     std::vector<store::RecentFootage> recent;
@@ -50,6 +52,7 @@ struct MountContext {
 MountContext ReadMountContext(const Call& call) {
     const base::Installation& installation = call.context.Installation();
     MountContext known;
+    known.host = installation.HostId();
     if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
         known.states = maintenance::ReadMountStatus(installation);
     }
@@ -87,6 +90,10 @@ Condition Inspect(store::Store& records, const store::Mount& mount) {
 }
 
 Condition ConditionOf(store::Store& records, const store::Mount& mount, const MountContext& known) {
+    if (!mount.IsOf(known.host)) {
+        const auto host = store::Hosts(records).Find(mount.host_id);
+        return {"other-host", host ? "it is of host " + host->name : "it is of a host that was removed"};
+    }
     Condition condition;
     try {
         condition = Inspect(records, mount);

@@ -47,7 +47,9 @@ std::string MaxAgeText(const Json::Value& seconds) {
 }
 
 std::string FreeText(const Json::Value& mount) {
-    return mount["present"].asBool() ? FormatSize(mount["free_bytes"].asInt64()) : "not there";
+    return mount["present"].asBool()      ? FormatSize(mount["free_bytes"].asInt64())
+           : mount["other_host"].asBool() ? "on another host"
+                                          : "not there";
 }
 
 std::string StateText(const Json::Value& mount) {
@@ -115,13 +117,15 @@ std::optional<std::int64_t> FreeBytes(store::Store& store, const Mount& mount) {
 void List(const Console& console) {
     store::Store store = console.OpenStore();
     store::Events events(store);
+    const int host = console.Installation().HostId();
     Json::Value data = Json::arrayValue;
     for (const Mount& mount : Mounts(store).List()) {
         const store::MountContent content = events.Content(mount.id);
-        const std::optional<std::int64_t> free_bytes = FreeBytes(store, mount);
+        const auto free_bytes = mount.IsOf(host) ? FreeBytes(store, mount) : std::nullopt;
         Json::Value& entry = data.append(ToData(mount));
         entry["events"] = content.events;
         entry["size_bytes"] = content.size_bytes;
+        entry["other_host"] = !mount.IsOf(host);
         entry["present"] = free_bytes.has_value();
         entry["free_bytes"] = free_bytes.value_or(0);
     }

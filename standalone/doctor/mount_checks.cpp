@@ -142,7 +142,7 @@ Findings CheckMounts(const base::Installation& installation) {
         const int host = installation.HostId();
         std::erase_if(mounts, [host](const store::Mount& mount) { return !mount.IsOf(host); });
         if (mounts.empty()) {
-            return {{"there is no mount to record to", "lookhaven init"}};
+            return {{"there is no mount to record to", host == 0 ? "lookhaven init" : "lookhaven mount add FOLDER"}};
         }
         std::map<int, int> cameras = CountCamerasByMount(store, host);
         for (const store::Mount& mount : mounts) {

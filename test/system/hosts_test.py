@@ -129,6 +129,8 @@ class HostsTest(unittest.TestCase):
         with answer:
             subjects = {each["subject"] for each in json.load(answer)["data"]["problem"]}
         self.assertLessEqual(subjects, {"recorder"})
+        mounts = self.other.request(call("VEXO.Mount", "List"), "admin", form={}).json["data"]["mount"]
+        self.assertEqual({(each["state"], each["message"]) for each in mounts}, {("other-host", "it is of host North")})
 
     def test_an_export_comes_through(self):
         span = {"cameralists": "1,2", "from": self.event["start"], "to": self.event["start"] + 10}

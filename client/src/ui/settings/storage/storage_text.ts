@@ -16,6 +16,7 @@ const kStates: Record<string, string> = {
   "space-held": "deleting frees no space",
   absent: "not mounted",
   foreign: "belongs to another mount",
+  "other-host": "on another host",
 };
 
 export function stateText({ enabled, state }: Pick<MountRecord, "enabled" | "state">): string {
