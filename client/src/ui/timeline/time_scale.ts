@@ -9,9 +9,9 @@ const kSecondMs = 1_000;
 const kMinuteMs = 60_000;
 const kHourMs = 3_600_000;
 const kDayMs = 86_400_000;
-/** From twenty seconds on a screen's width to some forty days. */
-const kMinMsPerPx = 15;
-const kMaxMsPerPx = (45 * kDayMs) / 1200;
+/** What the whole width shows at least and at most, however wide it is. */
+const kMinSpanMs = 10 * kSecondMs;
+const kMaxSpanMs = 90 * kDayMs;
 /** Room that the label of a tick takes. */
 const kLabelPx = 76;
 
@@ -19,7 +19,7 @@ const kSteps = [1, 2, 5, 10, 15, 30]
   .map((seconds) => seconds * kSecondMs)
   .concat([1, 2, 5, 10, 15, 30].map((minutes) => minutes * kMinuteMs))
   .concat([1, 2, 3, 6, 12].map((hours) => hours * kHourMs))
-  .concat([1, 2, 7, 14].map((days) => days * kDayMs));
+  .concat([1, 2, 7, 14, 28, 56].map((days) => days * kDayMs));
 
 export interface Tick {
   atMs: number;
@@ -35,11 +35,11 @@ export class TimeScale {
 
   constructor(startMs: number, msPerPx: number, widthPx: number) {
     this.startMs = startMs;
-    this.msPerPx = Math.min(kMaxMsPerPx, Math.max(kMinMsPerPx, msPerPx));
     this.widthPx = Math.max(1, widthPx);
+    this.msPerPx = Math.min(kMaxSpanMs / this.widthPx, Math.max(kMinSpanMs / this.widthPx, msPerPx));
   }
 
-  /** Shows this span, in the middle if it is too short for the finest zoom. */
+  /** Shows this span; the middle of it where it is too long, and it in the middle where it is too short. */
   static of(fromMs: number, toMs: number, widthPx: number): TimeScale {
     const scale = new TimeScale(fromMs, (toMs - fromMs) / Math.max(1, widthPx), widthPx);
     return scale.panned((scale.spanMs - (toMs - fromMs)) / 2 / scale.msPerPx);
@@ -69,6 +69,12 @@ export class TimeScale {
   zoomed(factor: number, px: number): TimeScale {
     const zoomed = new TimeScale(this.startMs, this.msPerPx * factor, this.widthPx);
     return new TimeScale(this.msAt(px) - px * zoomed.msPerPx, zoomed.msPerPx, this.widthPx);
+  }
+
+  /** The same zoom, as far as it goes, and the same end on another width. */
+  resized(widthPx: number): TimeScale {
+    const resized = new TimeScale(this.startMs, this.msPerPx, widthPx);
+    return new TimeScale(this.endMs - resized.spanMs, resized.msPerPx, widthPx);
   }
 
   /** The content moved to the right. */

@@ -203,10 +203,10 @@ export class Timeline {
     const widthPx = this.#drawn.clientWidth;
     if (widthPx === 0) return;
     this.root.style.setProperty("--lanes", String(Math.max(1, this.#lanes.length)));
-    const { startMs, endMs, msPerPx } = this.#scale;
+    const { startMs, endMs } = this.#scale;
     // The newest stays in place: the right end does. What was shown before there was a width stays whole.
     const isFirst = this.#colours === null;
-    this.#scale = isFirst ? TimeScale.of(startMs, endMs, widthPx) : new TimeScale(endMs - widthPx * msPerPx, msPerPx, widthPx);
+    this.#scale = isFirst ? TimeScale.of(startMs, endMs, widthPx) : this.#scale.resized(widthPx);
     this.#colours = coloursOf(this.root);
     this.#actions.moved();
     this.redraw();
