@@ -2,11 +2,16 @@
 #
 # What was really recorded is what a search finds, for those who may see it.
 import calendar
+import pathlib
 import subprocess
+import sys
 import time
 import unittest
 
-from installation import PLAYER, Installation, call, recorded_events, wait_until
+from installation import PASSWORDS, PLAYER, Installation, call, recorded_events, wait_until
+
+sys.path.append(str(pathlib.Path(__file__).resolve().parents[2] / "bench"))
+from postgres import Postgres  # noqa: E402
 
 
 class SearchTest(unittest.TestCase):
@@ -96,6 +101,22 @@ class SearchTest(unittest.TestCase):
                 self.assertEqual([one["id"] for one in found], [mark] * is_found)
                 for one in found:
                     self.assertIn("searched", one["found"][1][1::2])
+
+
+class PostgresSearchTest(unittest.TestCase):
+    """The same words, where PostgreSQL keeps the records and searches the texts."""
+
+    @classmethod
+    def setUpClass(cls):
+        store = cls.enterClassContext(Postgres()).new_database("search")
+        server = Installation()
+        server.home.mkdir()
+        (server.home / "store").write_text(store + "\n")
+        server.cli("init", "--admin", "admin", text=PASSWORDS["admin"] + "\n")
+        server.cli("demo", "setup", text=PASSWORDS["viewer"] + "\n")
+        cls.server = cls.enterClassContext(server)
+
+    test_words_find_what_a_mark_says = SearchTest.test_words_find_what_a_mark_says_for_those_who_may_see_its_camera
 
 
 class RecordedNowTest(unittest.TestCase):
