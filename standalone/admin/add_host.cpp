@@ -23,6 +23,11 @@ store::Host AddHost(store::Store& store, const Actor& actor, const base::Install
         Apply(store, actor, [&] {
             store::Hosts hosts(store);
             const std::optional<store::Host> known = hosts.Find(known_id);
+            if (known && known->name != place.name) {
+                throw store::InvalidRecord(
+                    "this machine is host " + known->name +
+                    " already; on a copy of that host's state folder, remove the file host first");
+            }
             host = known.value_or(store::Host());
             host.name = place.name;
             host.address = place.address;

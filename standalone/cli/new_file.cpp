@@ -110,8 +110,12 @@ class UnfinishedFile {
         const int error = base::ReadAll(told, &finished, 1) == 1 ? Publish(unfinished_, file_) : ECANCELED;
         if (error != 0) {
             ::unlink(unfinished_.c_str());
+            ::_exit(error);
         }
-        ::_exit(error);
+        // The name, too, is on the disk then.
+        const std::filesystem::path folder = std::filesystem::absolute(file_).parent_path();
+        const base::FileDescriptor opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+        ::_exit(opened && ::fsync(opened.Get()) == 0 ? 0 : errno);
     }
 
     int End() {

@@ -46,7 +46,7 @@ class Sharing {
         if (camera.next_host_id != 0 && camera.next_host_id != own && Takes(camera.next_host_id)) {
             return true;
         }
-        return !Takes(own) && AnotherTakes(own);
+        return hosts_.at(own).gives && AnotherTakes(own);
     }
 
     // Who takes a camera that is free; 0 for nobody. It counts as that host's from then on.

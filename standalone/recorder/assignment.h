@@ -52,6 +52,7 @@ struct AssignedHost {
     bool is_there = false;  // what it has is its own
     bool runs = false;      // as far as can be told; it may have been stopped a moment ago and start again
     bool takes = false;     // floating cameras: it runs, has a mount to record to, and does not drain
+    bool gives = false;     // its floating cameras, where another host takes them
 };
 
 struct Assignment {

@@ -24,12 +24,18 @@ HostCameras::HostCameras(const base::Installation& installation, const EventRowQ
     : installation_(installation),
       rows_(rows),
       own_(installation.HostId()),
+      away_us_(away_us),
       watch_(away_us),
       thread_(installation.StoreUrl(), "share the cameras with the other hosts",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
 void HostCameras::Ask(bool has_room) {
     has_room_ = has_room;
+    if (has_room) {
+        no_room_since_us_ = 0;
+    } else if (no_room_since_us_ == 0) {
+        no_room_since_us_ = base::MonotonicMicros();
+    }
     thread_.Ask();
 }
 
@@ -61,7 +67,7 @@ void HostCameras::Work(store::Store& store) {
     if (!rows_.FirstReservedId()) {
         return;
     }
-    NoteVersion(hosts, all);
+    hosts.SetVersion(own_, base::kVersion);
     hosts.SetRoom(own_, has_room_);
     store::CameraLeases leases(store);
     const std::vector<store::CameraLease> cameras = leases.List();
@@ -92,16 +98,6 @@ void HostCameras::Work(store::Store& store) {
     Report(watched, cameras);
 }
 
-// After an upgrade.
-void HostCameras::NoteVersion(store::Hosts& hosts, const std::vector<store::Host>& all) const {
-    const auto own = std::ranges::find(all, own_, &store::Host::id);
-    if (own != all.end() && own->version != base::kVersion) {
-        store::Host updated = *own;
-        updated.version = base::kVersion;
-        hosts.Update(updated);
-    }
-}
-
 std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& all) {
     watch_.Observe(all, base::MonotonicMicros());
     std::vector<AssignedHost> hosts;
@@ -109,7 +105,14 @@ std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& a
         const bool is_there = host.id == own_ || watch_.IsThere(host.id);
         const bool runs = host.id == own_ || (is_there && !host.recorder.empty());
         const bool has_room = host.id == own_ ? has_room_.load() : host.has_room;
-        hosts.push_back({host.id, is_there, runs, runs && has_room && !host.draining});
+        // Not at once: its mounts may not have been looked at yet, or be back in a moment.
+        const std::int64_t since_us = no_room_since_us_;
+        const bool lacks_room = host.id == own_ && since_us != 0 && base::MonotonicMicros() - since_us > away_us_;
+        hosts.push_back({.id = host.id,
+                         .is_there = is_there,
+                         .runs = runs,
+                         .takes = runs && has_room && !host.draining,
+                         .gives = host.draining || lacks_room});
     }
     return hosts;
 }

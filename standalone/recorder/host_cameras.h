@@ -49,7 +49,6 @@ class HostCameras {
 
   private:
     void Work(store::Store& store);
-    void NoteVersion(store::Hosts& hosts, const std::vector<store::Host>& all) const;
     std::vector<AssignedHost> Observe(const std::vector<store::Host>& all);
     void Publish(std::set<int> held);
     void NoteHolders(const std::vector<store::CameraLease>& cameras);
@@ -60,6 +59,8 @@ class HostCameras {
     const EventRowQueue& rows_;
     const int own_;
     std::atomic<bool> has_room_ = false;
+    std::atomic<std::int64_t> no_room_since_us_ = 0;  // 0: it has room, or was not asked yet
+    const std::int64_t away_us_;
 
     // Only the thread uses these.
     HostWatch watch_;

@@ -43,7 +43,9 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(), [this](const store::Mark& mark) {
-                            return !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
+                            // A host that was cut off stores the rows of its footage when it is back.
+                            return (!hosts_ || base::WallSeconds() >= mark.end_s + kFootageElsewhereS) &&
+                                   !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
                         });
                     }) {
     try {

@@ -73,6 +73,11 @@ void Hosts::Update(const Host& host) {
     });
 }
 
+void Hosts::SetVersion(int id, const std::string& version) {
+    connection_.Execute("update hosts set version = :version where id = :id and version <> :known", version, id,
+                        version);
+}
+
 void Hosts::SetRoom(int id, bool has_room) {
     connection_.Execute("update hosts set has_room = :room where id = :id and has_room <> :known", has_room, id,
                         has_room);

@@ -33,7 +33,7 @@ struct Host {
     friend bool operator==(const Host&, const Host&) = default;
 };
 
-// Invariants    (1) Every change but SetRoom raises Settings::Revision() in the same transaction.
+// Invariants    (1) Every change but these of a recorder raises Settings::Revision() in the same transaction.
 class Hosts {
   public:
     // The store must outlive this object.
@@ -44,7 +44,8 @@ class Hosts {
     int Add(const Host& host);
     // Replaces name, address, port, certificate, version and draining of host.id. Throws as Add, and NotFound.
     void Update(const Host& host);
-    // Raises no revision. Nothing happens for an unknown host, or when it is stored so.
+    // Raise no revision. Nothing happens for an unknown host, or when it is stored so.
+    void SetVersion(int id, const std::string& version);
     void SetRoom(int id, bool has_room);
     // Removes the record, and gives up its leases; its mounts, with what lies on them, stay, and keep its id. Those of
     // the last host become a single machine's again. Throws NotFound; InvalidRecord while cameras are fixed to it.

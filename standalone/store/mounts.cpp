@@ -170,7 +170,7 @@ std::optional<Mount> Mounts::Find(int id) {
 std::optional<Mount> Mounts::FindForPlan(int id, int host) {
     if (id != 0) {
         std::optional<Mount> named = Find(id);
-        if (host == 0 || (named && named->IsOf(host))) {
+        if (!named ? host == 0 : named->IsOf(host)) {
             return named;
         }
     }

@@ -15,7 +15,8 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr AssignedHost kTakes{0, true, true, true};
-constexpr AssignedHost kDrains{0, true, true, false};
+constexpr AssignedHost kDrains{0, true, true, false, true};
+constexpr AssignedHost kHasNoRoom{0, true, true, false};
 constexpr AssignedHost kStopped{0, true, false, false};
 constexpr AssignedHost kAway{0, false, false, false};
 
@@ -47,6 +48,7 @@ TEST(Assignment, ACameraMovesWhenItMustAndSomebodyTakesIt) {
         {"own", {kTakes, kTakes}, {.host_id = 1}},
         {"free, and this host drains", {kDrains, kTakes}, {.host_id = 0}},
         {"own, and this host drains", {kDrains, kTakes}, {.host_id = 1}, false, true},
+        {"own, and this host has no room for a moment", {kHasNoRoom, kTakes}, {.host_id = 1}},
         {"own, and all drain", {kDrains, kDrains}, {.host_id = 1}},
         {"own, and only a stopped host could take it", {kDrains, kStopped}, {.host_id = 1}},
         {"fixed to this host, and free", {kDrains, kTakes}, {.fixed_host_id = 1}, true},
