@@ -15,8 +15,9 @@
 //   playback/  recordings: what is known of them (footage_cache, footage_lookup, coverage, recorded_days), fetched a
 //              few requests at a time (request_queue); a player plays one (player_state, open_footage, shown_frame,
 //              still_reader, playback): footage_stream chooses between pictures (frame_stream) and what was recorded
-//              (video_stream, with video_decoding and recorded_sound); sync_playback those of several cameras (tracks) by one playback_clock; scrub_stills are the pictures of
-//              a playhead that is dragged; event_walk: the events before and after
+//              (video_stream, with video_decoding and recorded_sound). sync_playback keeps the players of several
+//              cameras (tracks) in step by one playback_clock; scrub_stills: the pictures of a playhead that is
+//              dragged; event_walk: the events before and after
 //   ui/        app goes from screen to screen
 //     screens/    what fills the window: login, first account (setup), wall, events, maps, settings; what they have in
 //                 common (screen), and their addresses (route)
@@ -33,8 +34,8 @@
 //   style/     base and components are for all, screen for the bar of each screen; every other file is for what its
 //              name says
 //
-// ui may use live, playback and wire; playback uses live and wire, live uses wire. Nothing here writes markup from text (see dom), and
-// the page needs neither inline styles nor scripts, so that a content security policy of 'self' holds.
+// ui may use live, playback and wire; playback uses live and wire, live uses wire. Nothing here writes markup from text
+// (see dom), and the page needs neither inline styles nor scripts, so that a content security policy of 'self' holds.
 
 import "./style/base.css";
 import "./style/components.css";

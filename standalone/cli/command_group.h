@@ -86,9 +86,6 @@ class Command {
         return *this;
     }
 
-    // Leaves the command out of the help.
-    void Hide() { app_->group(""); }
-
   private:
     CLI::App* app_;
 };

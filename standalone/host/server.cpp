@@ -128,8 +128,8 @@ void Server::Read(int socket) {
         connections_.erase(found);
     } else if (!connection.refused) {
         const ScgiParser::State state = connection.parser.Feed({bytes.data(), static_cast<std::size_t>(got)});
-        ::explicit_bzero(bytes.data(),
-                         static_cast<std::size_t>(got));  // processes that are forked here would inherit it
+        // Processes that are forked here would inherit it.
+        ::explicit_bzero(bytes.data(), static_cast<std::size_t>(got));
         switch (state) {
         case ScgiParser::State::kIncomplete:
             return;

@@ -33,7 +33,6 @@ class Scene {
     void Restore(const Area& area);
     void DrawMoon(std::int64_t wall_millis);
     void DrawMarker(std::int64_t wall_millis);
-    void DrawClock(std::int64_t wall_millis);
     void DrawText(Picture& picture, const GlyphSet& glyphs, int x, int y, std::string_view text);
 
     int width_;
