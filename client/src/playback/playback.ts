@@ -18,7 +18,10 @@ import { streamEnd } from "./stream_end";
 const kTailDelayMs = 1_000;
 /** Between attempts to get a lost stream back. */
 const kRetryMs = 1_000;
-/** After so many streams in a row that give nothing but the frame on the screen, footage ends, whatever it says. */
+/**
+ * After this many lost streams in a row that showed nothing new, the recording counts as ended, even if its file claims
+ * more.
+ */
 const kMaxSilentStreams = 2;
 
 /** Where the frames go. */
@@ -90,7 +93,7 @@ export class Playback {
     }
   }
 
-  /** After a stream from that frame on was lost, which lasted so long. */
+  /** Whether the recording counts as ended after a stream that began at `from` was lost after `ms`. */
   #isOver(from: number, ms: number): boolean {
     const isStill = this.#key !== 0 && this.#sink.shown.index === from;
     const isSilent = isStill && ms >= kMaxSilenceMs && !this.#opened.footage.isGrowing;

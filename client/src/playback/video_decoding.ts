@@ -59,14 +59,14 @@ export class VideoDecoding {
     if (this.#failure) throw this.#failure;
     if (!this.#decoder) return;
     if (facts) this.#facts.set(timestampUs, facts);
-    // What was given so long ago was left out.
+    // The decoder dropped it.
     const [oldest] = this.#facts.keys();
     if (this.#facts.size > kMaxHeld) this.#facts.delete(oldest!);
     this.#held += 1;
     if (this.#held > kMaxHeld) throw undecodable();
     try {
       this.#decoder.decode(new EncodedVideoChunk({ type: isKey ? "key" : "delta", timestamp: timestampUs, data }));
-      this.#await();
+      this.#restartStallTimer();
     } catch {
       throw undecodable();
     }
@@ -82,7 +82,7 @@ export class VideoDecoding {
   async finish(): Promise<void> {
     if (this.#decoder?.state !== "configured") return;
     this.#isFinishing = true;
-    this.#await();
+    this.#restartStallTimer();
     // Closing the decoder ends it as well.
     await this.#decoder.flush().catch(() => undefined);
     this.#isFinishing = false;
@@ -107,7 +107,7 @@ export class VideoDecoding {
       error: () => this.#fail(),
     });
     decoder.addEventListener("dequeue", () => {
-      this.#await();
+      this.#restartStallTimer();
       this.#changed();
     });
     decoder.configure(config);
@@ -115,12 +115,14 @@ export class VideoDecoding {
     this.#codecString = codec;
   }
 
-  /** It goes on. As long as it has work, it is to go on; while nobody takes its pictures it may wait. */
-  #await(): void {
+  /**
+   * Restarts the timer that gives a stalled decoder up; it does not run out while finished pictures wait to be taken.
+   */
+  #restartStallTimer(): void {
     clearTimeout(this.#stalled);
     if (!this.#isFinishing && !this.#decoder?.decodeQueueSize) return;
     const giveUp = () => {
-      if (this.#ready.length > 0 && !this.#isFinishing) return this.#await();
+      if (this.#ready.length > 0 && !this.#isFinishing) return this.#restartStallTimer();
       if (this.#decoder?.state === "configured") this.#decoder.close();
       this.#fail();
     };
@@ -135,7 +137,7 @@ export class VideoDecoding {
 
   #receive(picture: VideoFrame): void {
     this.#held = 0;
-    this.#await();
+    this.#restartStallTimer();
     const facts = this.#facts.get(picture.timestamp);
     this.#facts.delete(picture.timestamp);
     if (!facts || !this.#decoder) return picture.close();
