@@ -38,7 +38,8 @@ store::Host AddHost(store::Store& store, const Actor& actor, const base::Install
 // Whether it gives its floating cameras away.
 store::Host DrainHost(store::Store& store, const Actor& actor, const std::string& name, bool draining);
 
-// How many recordings lie on the host's mounts, which nobody reaches once it is removed. Shared ones do not count.
+// How many recordings lie on the host's mounts, which only that host can play once it is removed. Shared ones do
+// not count.
 std::int64_t FootageOf(store::Store& store, int host);
 
 // Removes the host; its mounts and their rows stay. Throws StillNeeded while cameras are fixed to it, and, unless

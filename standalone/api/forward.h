@@ -25,11 +25,12 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
 enum class Forwarded {
     kLive,     // pictures of this moment: a viewer who takes none gets fewer of them
     kFootage,  // all of it, at whatever pace
-    kControl,  // of a player that may be at another host: of 404 nothing is sent
+    kControl,  // steers a player that may run on another host; a 404 is not forwarded
 };
 
-// Sends the answer; false where nothing was sent since the host answered with 404, only for kControl. what: that lies
-// there, such as "camera 3". Closes the store. Throws Failure 503 where the host is away.
+// Sends the answer; false where nothing was sent since the host answered with 404, only for kControl. what: names
+// what the host has, e.g. "camera 3", for the error message. Closes the store. Throws Failure 503 where the
+// host is away.
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what);
 
 }  // namespace lookhaven::api

@@ -15,7 +15,7 @@ std::int64_t MonotonicMicros();
 std::int64_t WallMillis();
 std::int64_t WallSeconds();
 
-// 32 hexadecimal digits, the same for all processes of the machine until it boots. A container hides /proc's id
+// 32 hexadecimal digits, the same for all processes of the machine until the next boot. A container hides /proc's id
 // behind one of its own, but not in the /proc of a confined service: there LOOKHAVEN_BOOT_ID says it.
 std::string BootId();
 

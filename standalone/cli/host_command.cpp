@@ -116,7 +116,7 @@ void AddHosts(CLI::App& program, const Console& console) {
     group.Add("balance", "Shares the cameras out anew among the hosts", Balance);
     group.Add("remove", "Removes a host; the recordings on its mounts are left as they are", Remove)
         .Option("name", request.name, name, Required)
-        .Flag("--yes", request.yes, "Also where its mounts hold recordings, which nobody reaches then");
+        .Flag("--yes", request.yes, "Also where its mounts hold recordings, which only that host can still play");
 }
 
 }  // namespace lookhaven::cli

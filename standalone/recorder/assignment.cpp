@@ -8,7 +8,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// Without the store for a longer part of the time until a host counts as away, and the watch begins anew.
+// A gap between two looks at the store longer than away_us / kMaxGapPart starts every host's timer anew.
 constexpr std::int64_t kMaxGapPart = 3;
 
 class Sharing {

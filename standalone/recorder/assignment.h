@@ -8,7 +8,7 @@
 // Invariants    (1) A camera that is fixed to a host is taken by that host alone.
 //               (2) Nothing is given away that nobody is there to take: recording by the wrong host is better than
 //                   none.
-//               (3) A floating camera moves when its holder is away, drains, or an owner moved it, and never
+//               (3) A floating camera moves when its holder is away, drains, or an operator moved it, and never
 //                   otherwise.
 #pragma once
 

@@ -41,7 +41,7 @@ class HostCameras {
     std::set<int> Held() const;
     // Another host has its lease, there or away; also while that is not known yet.
     bool IsHeldElsewhere(int camera) const;
-    // What runs after all that Held said last was done, and may go on writing.
+    // The cameras still being recorded or written once the last Held() was acted upon.
     void NoteRecorded(std::set<int> cameras);
     // As in StoreThread.
     void RequestStop() { thread_.RequestStop(); }

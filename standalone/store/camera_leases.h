@@ -23,7 +23,7 @@ struct CameraLease {
     int fixed_host_id = 0;   // Camera::host_id
     int host_id = 0;         // the holder; 0: nobody
     std::int64_t count = 0;  // 0: nobody ever had it
-    int next_host_id = 0;    // to which an owner moved it; 0: it stays
+    int next_host_id = 0;    // to which an operator moved it; 0: it stays
 
     friend bool operator==(const CameraLease&, const CameraLease&) = default;
 };

@@ -25,8 +25,8 @@ struct Host {
     bool draining = false;         // gives the cameras away that others may record, and takes none
     bool has_room = false;         // has a mount to record to; as its recorder says
     // The count of its recorder's lease (recorder_lease.h): changes while the recorder runs and reaches the store. Away
-    // is a host whose heartbeat has stood still for a while by the watcher's own monotonic clock; the clocks of two
-    // hosts are never compared.
+    // is a host whose heartbeat has stood still for a while by the watcher's own monotonic clock; this never
+    // compares the clocks of two hosts.
     std::int64_t heartbeat = 0;
     std::string recorder = {};  // the name of the recorder that holds the lease; empty while none runs
 
