@@ -107,7 +107,7 @@ class Passage : public remote::AnswerSink {
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
-    // What the web server there says while its host is away.
+    // The other web server's answer while its host is away, or that host's own.
     bool IsFromNobody() const { return status_ == kBadGateway; }
     bool IsWithheld() const { return IsFromNobody() || (kind_ == Forwarded::kControl && status_ == 404); }
 

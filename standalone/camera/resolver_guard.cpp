@@ -43,7 +43,8 @@ extern "C" __attribute__((visibility("default"))) int getaddrinfo(const char* na
     using namespace lookhaven::camera;
     static const auto real = reinterpret_cast<decltype(&getaddrinfo)>(::dlsym(RTLD_NEXT, "getaddrinfo"));
     if (name == nullptr || ::strcasecmp(name, permitted_host.c_str()) != 0) {
-        // A number alone is the address that a session description names, which TCP has no use for: no redirect.
+        // A numeric-only look-up is for the address in a session description, which TCP does not use; it is no
+        // redirect.
         const bool only_number = hints != nullptr && (hints->ai_flags & AI_NUMERICHOST) != 0;
         if (name != nullptr && !only_number) {
             refused_host = name;

@@ -161,8 +161,8 @@ class SlotTable {
     void BeginPlayer(Slot& slot, std::int64_t key);
     // The session's newest player under the key, which may still be opening its recording, but not one that must end.
     std::optional<RequestRef> FindPlayer(std::string_view session, std::int64_t key) const;
-    // For a request process: it passes on the stream of a player that runs at that host. And of the session's newest such
-    // request, the host; 0: none.
+    // NoteForwardedPlayer: this request forwards the stream of a player on another host. FindForwardedPlayer: the host
+    // of the session's newest such player with this key; 0 if none.
     static void NoteForwardedPlayer(Slot& slot, std::int64_t key, int host);
     int FindForwardedPlayer(std::string_view session, std::int64_t key) const;
     // Held by requests while they change more than one thing of a player, whose rate is in its progress file and whose

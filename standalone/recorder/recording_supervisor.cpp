@@ -20,7 +20,7 @@ LeaseTimes TimesFor(std::chrono::microseconds host_away_limit) {
     return {host_away_limit.count() / 6, host_away_limit.count() * 2 / 3};
 }
 
-// When no more footage of a mark can be expected from a camera that another host records now.
+// How long after a mark's end another host may still deliver footage of it.
 constexpr std::int64_t kFootageElsewhereS = 900;
 
 }  // namespace

@@ -12,7 +12,7 @@ export function tellNewEvents(alerts: Alerts, closed: AbortSignal): void {
   const look = () => {
     if (document.hidden || !alerts.isCaughtUp) return;
     const isFirst = !isTold;
-    // Before the look, which changes the news.
+    // Set first: `look` calls this listener again.
     isTold = true;
     const text = newsText(alerts.look());
     if (text && isFirst) notify(`${text}.`);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The address and what is shown of the events, kept in step: what it names is shown, and what is shown it leads to, to
-// the frame where a picture stands still.
+// Keeps address and screen in step: opens what the address names, and writes what is shown into it, to the frame where
+// a picture stands still.
 
 import type { SyncPlayback } from "../../playback/sync_playback";
 import { isSameFootage } from "../../wire/footage";

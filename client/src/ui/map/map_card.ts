@@ -13,7 +13,7 @@ import { draw, element, setText } from "../widgets/dom";
 import { clockTime, minuteText, shortDate } from "../widgets/text";
 import { kindName, type MapItemView } from "./map_item";
 
-/** Of a POS terminal. */
+/** How many a POS terminal's card lists. */
 const kSales = 5;
 
 export class MapCard {
