@@ -20,13 +20,13 @@ let isPointerLast = false;
 let wasInDialog = false;
 const focusedByPointer = new WeakSet<EventTarget>();
 
-function act(byPointer: boolean): void {
+function noteInput(byPointer: boolean): void {
   isPointerLast = byPointer;
   wasInDialog = isInDialog(document.activeElement);
 }
 
 /** Firefox tells nothing of a focus that a dialog gives back. */
-function follow(focused: EventTarget): void {
+function noteFocus(focused: EventTarget): void {
   if (wasInDialog && !isInDialog(focused)) return;
   if (isPointerLast) focusedByPointer.add(focused);
   else focusedByPointer.delete(focused);
@@ -36,9 +36,9 @@ function isInDialog(focused: EventTarget | null): boolean {
   return focused instanceof Element && focused.closest("dialog") !== null;
 }
 
-addEventListener("pointerdown", () => act(true), true);
-addEventListener("keydown", () => act(false), true);
-addEventListener("focusin", ({ target }) => follow(target!), true);
+addEventListener("pointerdown", () => noteInput(true), true);
+addEventListener("keydown", () => noteInput(false), true);
+addEventListener("focusin", ({ target }) => noteFocus(target!), true);
 
 /** Whether it was a click or tap that brought the focus to where it is. */
 export function hasFocusByPointer(): boolean {
