@@ -241,9 +241,10 @@ constexpr const char* kPreferences[] = {
 // A lease is one host's while that host's heartbeat changes. Hosts may each have a mount at the same path.
 constexpr const char* kHosts[] = {
     "insert into counters (name, value) values ('host', 0)",
-    "create table hosts (id integer not null primary key, name text not null unique, address text not null,"
-    " port integer not null, certificate text not null, version text not null, draining integer not null,"
-    " has_room integer not null, heartbeat bigint not null, holder text not null, first_reserved_id integer not null)",
+    ("create table hosts (id integer not null primary key, name text not null unique, address text not null,"
+     " port integer not null, certificate text not null, version text not null, draining integer not null,"
+     " has_room integer not null, heartbeat bigint not null, holder text not null,"
+     " first_reserved_id integer not null)"),
     // No reference to hosts: a host that was removed leaves its footage, and cameras that wait for it.
     "alter table cameras add column host_id integer not null default 0",
     "alter table mounts add column host_id integer not null default 0",
@@ -251,9 +252,9 @@ constexpr const char* kHosts[] = {
      " host_id integer not null, count bigint not null, next_host_id integer not null)"),
 };
 constexpr const char* kMountPathsOnSqlite[] = {
-    "create table mounts_of_hosts (id integer not null primary key, name text not null unique, path text not null,"
-    " max_bytes bigint not null, max_age bigint not null, enabled integer not null, is_default integer not null,"
-    " host_id integer not null default 0)",
+    ("create table mounts_of_hosts (id integer not null primary key, name text not null unique, path text not null,"
+     " max_bytes bigint not null, max_age bigint not null, enabled integer not null, is_default integer not null,"
+     " host_id integer not null default 0)"),
     ("insert into mounts_of_hosts (id, name, path, max_bytes, max_age, enabled, is_default, host_id)"
      " select id, name, path, max_bytes, max_age, enabled, is_default, host_id from mounts"),
     "drop table mounts",
