@@ -1,35 +1,20 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/remote/forward_token.h"
 
-#include <array>
 #include <charconv>
-#include <stdexcept>
 
-#include <sodium.h>
-
-#include "standalone/base/text.h"
+#include "standalone/remote/token_code.h"
 
 namespace lookhaven::remote {
 
 namespace {
 
 constexpr std::string_view kLabel = "lookhaven forward 1\n";
-constexpr std::size_t kKeyDigits = 2 * crypto_auth_hmacsha256_KEYBYTES;
-constexpr std::size_t kCodeDigits = 2 * crypto_auth_hmacsha256_BYTES;
 constexpr std::size_t kMaxTokenBytes = 200;
 constexpr std::int64_t kMaxSeconds = 999'999'999'999;
 
 std::string CodeOf(std::string_view key, int to_host, std::string_view said) {
-    if (!base::IsHex(key, kKeyDigits)) {
-        throw std::invalid_argument("the key of hosts that share a store is 64 hexadecimal digits");
-    }
-    std::array<unsigned char, crypto_auth_hmacsha256_KEYBYTES> bytes{};
-    sodium_hex2bin(bytes.data(), bytes.size(), key.data(), key.size(), nullptr, nullptr, nullptr);
-    const std::string message = std::string(kLabel).append(std::to_string(to_host)).append(1, '\n').append(said);
-    std::array<unsigned char, crypto_auth_hmacsha256_BYTES> code{};
-    crypto_auth_hmacsha256(code.data(), reinterpret_cast<const unsigned char*>(message.data()), message.size(),
-                           bytes.data());
-    return base::ToHex(code);
+    return TokenCode(key, std::string(kLabel).append(std::to_string(to_host)).append(1, '\n').append(said));
 }
 
 bool IsWithinWindow(std::string_view timestamp, std::int64_t now_s) {
@@ -49,12 +34,11 @@ std::string MakeForwardToken(std::string_view key, int to_host, std::string_view
 
 std::optional<std::string> ClientInForwardToken(std::string_view token, std::string_view key, int own_host,
                                                 std::int64_t now_s) {
-    if (token.size() > kMaxTokenBytes || token.size() <= kCodeDigits || !base::IsHex(key, kKeyDigits)) {
+    if (token.size() > kMaxTokenBytes || token.size() <= kTokenCodeDigits || !IsTokenKey(key)) {
         return std::nullopt;
     }
-    const std::string_view said = token.substr(0, token.size() - kCodeDigits);
-    const std::string code = CodeOf(key, own_host, said);
-    if (sodium_memcmp(code.data(), token.data() + said.size(), kCodeDigits) != 0) {
+    const std::string_view said = token.substr(0, token.size() - kTokenCodeDigits);
+    if (!IsTokenCode(CodeOf(key, own_host, said), token.substr(said.size()))) {
         return std::nullopt;
     }
     // Made by the key, hence of this form.
