@@ -4,6 +4,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <vector>
 
 #include "platform/admission/pairauth.h"
 #include "standalone/api/export.h"
@@ -12,6 +13,7 @@
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/binding/rights.h"
+#include "standalone/maintenance/host_status.h"
 #include "standalone/store/hosts.h"
 
 namespace lookhaven::api {
@@ -92,7 +94,7 @@ Place PlaceOfFootage(const Call& call) {
 
 std::string NameOfHost(store::Store& records, int id) {
     const auto host = store::Hosts(records).Find(id);
-    return host ? host->name : "that was removed";
+    return host ? host->name : "a host that was removed";
 }
 
 // One file is made by one host: of all that is asked for.
@@ -109,7 +111,9 @@ Place PlaceOfExport(const Call& call) {
     for (const int id : hosts) {
         names += (names.empty() ? "" : ", ") + NameOfHost(call.Records(), id);
     }
-    throw Failure(409, "this footage lies on several hosts (" + names + "): export what each of them has by itself");
+    throw Failure(409,
+                  "this footage lies on several hosts (" + names +
+                      "): export each host's cameras, or for a camera that moved each part of the span, by itself");
 }
 
 Place PlaceOf(const Call& call, int own_host) {
@@ -126,7 +130,23 @@ Place PlaceOf(const Call& call, int own_host) {
     return needs_footage ? PlaceOfFootage(call) : Place();
 }
 
-// What steers the player at whichever host it runs, now.
+// Who may have a player that does not run here: the host whose stream of it this one forwards; else all that are not
+// away, since another host may forward the stream.
+std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_host) {
+    std::set<int> away;
+    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(call.context.Installation())) {
+        if (status.state == maintenance::HostState::kAway) {
+            away.insert(status.host);
+        }
+    }
+    std::vector<store::Host> hosts = store::Hosts(call.Records()).All();
+    std::erase_if(hosts, [&](const store::Host& host) {
+        return known_host != 0 ? host.id != known_host : host.id == own_host || away.contains(host.id);
+    });
+    return hosts;
+}
+
+// Steers the player at the host where it runs.
 bool IsControlledElsewhere(const Call& call, int own_host) {
     const Json::Value& key = call.Parameter("timestamp");
     if (!key.isInt64() || key.asInt64() < 1 || call.is_forwarded ||
@@ -134,13 +154,10 @@ bool IsControlledElsewhere(const Call& call, int own_host) {
         return false;
     }
     const int known = call.slots.FindForwardedPlayer(call.context.Session(), key.asInt64());
-    // Where another host passes the player's stream on, this one does not know where it runs.
-    for (const store::Host& host : store::Hosts(call.Records()).All()) {
-        if (known != 0 ? host.id != known : host.id == own_host) {
-            continue;
-        }
+    const Forwarded kind = known != 0 ? Forwarded::kControl : Forwarded::kSearch;
+    for (const store::Host& host : HostsToAsk(call, own_host, known)) {
         try {
-            if (Forward(call, host, Forwarded::kControl, "the player")) {
+            if (Forward(call, host, kind, "the player")) {
                 return true;
             }
         } catch (const Failure&) {
@@ -176,7 +193,7 @@ bool IsServedElsewhere(const Call& call) {
         throw Failure(503, place.what + " is on a host that was removed from this installation");
     }
     if (call.is_forwarded) {
-        throw Failure(503, place.what + " is on host " + host->name + " by now", http::kRetrySoonSeconds);
+        throw Failure(503, place.what + " has moved to host " + host->name + "; try again", http::kRetrySoonSeconds);
     }
     if (IsPlayer(call) || (call.api == kEventApi.name && call.method == "Stream")) {
         control::SlotTable::NoteForwardedPlayer(call.slot, call.NumberOr("timestamp", 0), host->id);

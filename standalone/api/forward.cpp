@@ -27,6 +27,8 @@ constexpr std::chrono::seconds kMaxSilentLive{60};
 constexpr int kLiveReceiveBytes = 64 << 10;
 constexpr std::size_t kMaxTagBytes = 100;
 constexpr int kBadGateway = 502;
+// A player answers within a second, and each host is asked.
+constexpr std::chrono::seconds kMaxSearch{3};
 
 bool IsPrintable(std::string_view text) {
     return std::ranges::all_of(text, [](char character) { return character >= ' ' && character <= '~'; });
@@ -63,6 +65,9 @@ remote::ForwardedRequest RequestOf(const Call& call, const store::Host& host, Fo
     if (kind == Forwarded::kLive) {
         request.max_silent = kMaxSilentLive;
         request.receive_bytes = kLiveReceiveBytes;
+    }
+    if (kind == Forwarded::kSearch) {
+        request.max_head_wait = kMaxSearch;
     }
     return request;
 }
@@ -109,7 +114,11 @@ class Passage : public remote::AnswerSink {
 
     // The other web server's answer while its host is away, or that host's own.
     bool IsFromNobody() const { return status_ == kBadGateway; }
-    bool IsWithheld() const { return IsFromNobody() || (kind_ == Forwarded::kControl && status_ == 404); }
+    bool IsWithheld() const {
+        const bool is_of_player = status_ < 400 || status_ == 400 || status_ == 409;
+        return IsFromNobody() || (kind_ == Forwarded::kControl && status_ == 404) ||
+               (kind_ == Forwarded::kSearch && !is_of_player);
+    }
 
   private:
     bool Send(std::span<const char> bytes) {
@@ -152,7 +161,10 @@ bool Forward(const Call& call, const store::Host& host, Forwarded kind, const st
     call.context.CloseRecords();
     Passage passage(call, kind);
     try {
-        remote::Forward({host.address, host.port, host.certificate}, request, passage);
+        const bool is_whole = remote::Forward({host.address, host.port, host.certificate}, request, passage);
+        if (!is_whole && !passage.IsWithheld() && passage.GoesOn()) {
+            base::LogWarning("host " + host.name + " broke off its answer to " + call.api + '/' + call.method);
+        }
     } catch (const remote::WrongCertificate&) {
         throw Away(host, what, "it shows another certificate than the one it was added with, or an expired one");
     } catch (const std::runtime_error& error) {

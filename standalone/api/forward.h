@@ -25,10 +25,11 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
 enum class Forwarded {
     kLive,     // pictures of this moment: a viewer who takes none gets fewer of them
     kFootage,  // all of it, at whatever pace
-    kControl,  // steers a player that may run on another host; a 404 is not forwarded
+    kControl,  // steers a player that ran on that host; a 404 is not forwarded
+    kSearch,   // steers a player that may run on that host; only what a player answers is forwarded, within seconds
 };
 
-// Sends the answer; false where nothing was sent since the host answered with 404, only for kControl. what: names
+// Sends the answer; false where nothing was sent since the host has no such player, only for the last two. what: names
 // what the host has, e.g. "camera 3", for the error message. Closes the store. Throws Failure 503 where the
 // host is away.
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what);

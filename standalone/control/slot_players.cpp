@@ -38,8 +38,8 @@ std::optional<RequestRef> SlotTable::FindPlayer(std::string_view session, std::i
 }
 
 void SlotTable::NoteForwardedPlayer(Slot& slot, std::int64_t key, int host) {
-    slot.forwarded_from = host;
-    slot.forwarded_key = key;
+    slot.player_host_id = host;
+    slot.forwarded_player_key = key;
 }
 
 int SlotTable::FindForwardedPlayer(std::string_view session, std::int64_t key) const {
@@ -47,8 +47,8 @@ int SlotTable::FindForwardedPlayer(std::string_view session, std::int64_t key) c
     std::uint64_t newest = 0;
     for (const Slot& slot : Used()) {
         const std::uint64_t serial = slot.serial;
-        if (serial > newest && slot.forwarded_key == key && SessionOf(slot) == session && !slot.MustEnd()) {
-            host = slot.forwarded_from;
+        if (serial > newest && slot.forwarded_player_key == key && SessionOf(slot) == session && !slot.MustEnd()) {
+            host = slot.player_host_id;
             newest = serial;
         }
     }

@@ -80,7 +80,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->player.is_excess = false;
     slot->player.paused = false;
     slot->player.pause = PackPause(++last_serial_, {});
-    slot->forwarded_key = 0;
+    slot->forwarded_player_key = 0;
     slot->serial = last_serial_;
     return slot;
 }

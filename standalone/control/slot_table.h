@@ -6,7 +6,7 @@
 //               whose session it serves, and only the host's watcher process knows which sessions have ended.
 // Invariants    (1) Only the host takes and frees slots; a free slot belongs to nobody.
 //               (2) A session handle is written once per use of a slot, before has_session is set; the call, before
-//                   has_call; what a player can do, before its key is set.
+//                   has_call; what a player can do, and the host of a forwarded one, before its key is set.
 //               (3) Other requests only store what they request of a player; only the host signals it.
 //               (4) What one request stores for another carries the serial of the request that it is meant for, so it
 //                   never reaches a later one in the same slot.
@@ -91,8 +91,8 @@ struct alignas(kSlotBytes) Slot {
     std::array<char, 64> call;
     std::atomic<int> status;  // of the answer, once it is known
     Player player;
-    std::atomic<std::int64_t> forwarded_key;  // of the player whose stream it passes on; 0: none
-    std::atomic<int> forwarded_from;          // the host where that player runs
+    std::atomic<std::int64_t> forwarded_player_key;  // of the player whose stream it forwards; 0: none
+    std::atomic<int> player_host_id;                 // the host where that player runs
 
     bool MustEnd() const { return ended == serial; }
 };

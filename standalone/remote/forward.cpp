@@ -19,8 +19,6 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr long kConnectMillis = 3'000;
-// Less than the host gives a request process for its answer.
-constexpr std::chrono::seconds kMaxHeadWait{28};
 constexpr long kKeepAliveSeconds = 5;
 constexpr unsigned int kMaxUnansweredMillis = 20'000;
 constexpr std::size_t kMaxHeaderBytes = 1'000;
@@ -50,6 +48,7 @@ class Passage {
     Passage(const Host& host, const ForwardedRequest& request, AnswerSink& sink)
         : sink_(sink),
           receive_bytes_(request.receive_bytes),
+          max_head_wait_(request.max_head_wait),
           handle_(host, request.query, LinesOf(request)) {
         handle_.Set(CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.json.size()));
         handle_.Set(CURLOPT_COPYPOSTFIELDS, request.json.data());
@@ -144,7 +143,7 @@ class Passage {
 
     static int OnProgress(void* self, curl_off_t, curl_off_t, curl_off_t, curl_off_t) {
         Passage& passage = *static_cast<Passage*>(self);
-        passage.is_late_ = !passage.has_begun_ && Clock::now() - passage.began_ > kMaxHeadWait;
+        passage.is_late_ = !passage.has_begun_ && Clock::now() - passage.began_ > passage.max_head_wait_;
         passage.is_ended_by_sink_ = passage.is_ended_by_sink_ || !passage.sink_.GoesOn();
         return passage.is_late_ || passage.is_ended_by_sink_ ? 1 : 0;
     }
@@ -159,6 +158,7 @@ class Passage {
 
     AnswerSink& sink_;
     const int receive_bytes_;
+    const std::chrono::seconds max_head_wait_;
     const Clock::time_point began_ = Clock::now();
     std::string problem_;
     bool is_late_ = false;

@@ -19,11 +19,12 @@
 namespace lookhaven::remote {
 
 struct ForwardedRequest {
-    std::string query;                  // without '?'
-    std::vector<std::string> headers;   // "Name: value" each
-    std::string json;                   // the body
-    std::chrono::seconds max_silent{};  // without a byte from that host; 0: for as long as the connection stands
-    int receive_bytes = 0;              // of the connection's buffer; 0: as many as are good for it
+    std::string query;                       // without '?'
+    std::vector<std::string> headers;        // "Name: value" each
+    std::string json;                        // the body
+    std::chrono::seconds max_head_wait{28};  // less than this host gives a request process for its answer
+    std::chrono::seconds max_silent{};       // without a byte from that host; 0: for as long as the connection stands
+    int receive_bytes = 0;                   // of the connection's buffer; 0: as many as are good for it
 };
 
 struct AnswerHead {
@@ -47,7 +48,7 @@ class AnswerSink {
 };
 
 // Returns when the answer has ended or the sink has ended it: whether the whole answer came. Throws NoAnswer when none
-// began, after three seconds where there is no such host and after 28 where it says nothing; WrongCertificate;
+// began, after three seconds where there is no such host and after max_head_wait where it says nothing; WrongCertificate;
 // InvalidCertificate; and std::runtime_error when the library cannot be loaded.
 bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);
 
