@@ -9,12 +9,14 @@
 #include <system_error>
 
 #include <fcntl.h>
+#include <sys/random.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
+#include "standalone/base/text.h"
 #include "standalone/cli/console.h"
 
 namespace lookhaven::cli {
@@ -25,17 +27,42 @@ namespace {
     throw Failure(kCannotCreate, "there is already a file ", file, ": name another one");
 }
 
-// Gives the file its name, unless there is one of that name. 0, or the error.
-int Publish(const std::string& unfinished, const std::string& file) {
-    if (::renameat2(AT_FDCWD, unfinished.c_str(), AT_FDCWD, file.c_str(), RENAME_NOREPLACE) == 0) {
-        return 0;
+// Gives the file in the folder its name, unless there is one of that name, and waits until the name is on the disk. 0,
+// or the error.
+int Publish(int folder, const std::string& unfinished, const std::string& name) {
+    if (::renameat2(folder, unfinished.c_str(), folder, name.c_str(), RENAME_NOREPLACE) != 0) {
+        // Some file systems, such as NFS, cannot do it in one step.
+        if (errno != EINVAL || ::linkat(folder, unfinished.c_str(), folder, name.c_str(), 0) != 0) {
+            return errno;
+        }
+        ::unlinkat(folder, unfinished.c_str(), 0);
     }
-    // Some file systems, such as NFS, cannot do it in one step.
-    if (errno != EINVAL || ::link(unfinished.c_str(), file.c_str()) != 0) {
-        return errno;
+    return ::fsync(folder) == 0 ? 0 : errno;
+}
+
+// Whether the name in the folder is that of the opened file, and not of another that was put there meanwhile.
+bool IsNameOf(int folder, const std::string& name, int file) {
+    struct stat named {};
+    struct stat opened {};
+    return ::fstatat(folder, name.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 && ::fstat(file, &opened) == 0 &&
+           named.st_dev == opened.st_dev && named.st_ino == opened.st_ino;
+}
+
+base::FileDescriptor OpenFolderOf(const std::string& file) {
+    const std::filesystem::path path = std::filesystem::absolute(file).parent_path();
+    base::FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (!folder) {
+        base::ThrowErrno("cannot make " + file);
     }
-    ::unlink(unfinished.c_str());
-    return 0;
+    return folder;
+}
+
+std::string UnfinishedName() {
+    std::array<unsigned char, 8> random{};
+    if (::getrandom(random.data(), random.size(), 0) != static_cast<ssize_t>(random.size())) {
+        base::ThrowErrno("cannot choose a name");
+    }
+    return ".lookhaven-" + base::ToHex(random);
 }
 
 // Signals that end a process wait while it exists.
@@ -55,12 +82,13 @@ class SignalsWait {
 };
 
 // A file without its name, and a process that gives it the name or removes it, with the rights of whoever made it; it
-// outlives this one, however that ends.
+// outlives this one, however that ends. The folder is opened once: another one that is put in its place gets nothing.
 class UnfinishedFile {
   public:
     explicit UnfinishedFile(const std::string& file)
         : file_(file),
-          unfinished_(std::filesystem::path(file).parent_path() / ".lookhaven-XXXXXX") {
+          folder_(OpenFolderOf(file)),
+          unfinished_(UnfinishedName()) {
         std::array<int, 2> ends{};
         if (::pipe2(ends.data(), O_CLOEXEC) != 0) {
             base::ThrowErrno("cannot make a pipe");
@@ -68,7 +96,8 @@ class UnfinishedFile {
         const base::FileDescriptor told(ends[0]);
         tell_ = base::FileDescriptor(ends[1]);
         const SignalsWait no_signal;
-        output_ = base::FileDescriptor(::mkostemp(unfinished_.data(), O_CLOEXEC));
+        output_ = base::FileDescriptor(
+            ::openat(folder_.Get(), unfinished_.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         if (!output_) {
             base::ThrowErrno("cannot make " + file);
         }
@@ -79,7 +108,7 @@ class UnfinishedFile {
         }
         if (keeper_ < 0) {
             const int error = errno;
-            ::unlink(unfinished_.c_str());
+            ::unlinkat(folder_.Get(), unfinished_.c_str(), 0);
             throw std::system_error(error, std::generic_category(), "cannot make " + file);
         }
     }
@@ -106,16 +135,17 @@ class UnfinishedFile {
   private:
     // Signals still wait here, and do so until the end.
     [[noreturn]] void Keep(int told) const {
+        const std::string name = std::filesystem::path(file_).filename();
         char finished = 0;
-        const int error = base::ReadAll(told, &finished, 1) == 1 ? Publish(unfinished_, file_) : ECANCELED;
-        if (error != 0) {
-            ::unlink(unfinished_.c_str());
-            ::_exit(error);
+        int error = ECANCELED;
+        if (base::ReadAll(told, &finished, 1) == 1) {
+            error = IsNameOf(folder_.Get(), unfinished_, output_.Get()) ? Publish(folder_.Get(), unfinished_, name)
+                                                                        : ESTALE;
         }
-        // The name, too, is on the disk then.
-        const std::filesystem::path folder = std::filesystem::absolute(file_).parent_path();
-        const base::FileDescriptor opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-        ::_exit(opened && ::fsync(opened.Get()) == 0 ? 0 : errno);
+        if (error != 0) {
+            ::unlinkat(folder_.Get(), unfinished_.c_str(), 0);
+        }
+        ::_exit(error);
     }
 
     int End() {
@@ -128,7 +158,8 @@ class UnfinishedFile {
     }
 
     const std::string file_;
-    std::string unfinished_;
+    const base::FileDescriptor folder_;
+    const std::string unfinished_;
     base::FileDescriptor tell_;
     base::FileDescriptor output_;
     pid_t keeper_ = -1;
