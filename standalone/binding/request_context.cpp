@@ -12,6 +12,7 @@
 #include "platform/log/dbglogcfg.h"
 #include "standalone/base/log.h"
 #include "standalone/control/debug_log_config.h"
+#include "standalone/store/camera_leases.h"
 #include "standalone/store/cameras.h"
 
 DbgLogCfg* g_pDbgLogCfg = nullptr;
@@ -99,12 +100,36 @@ const std::map<int, store::RecordingPlan>& RequestContext::Plans() {
     return *cache_.plans;
 }
 
+int RequestContext::HostOf(int camera_id) {
+    if (!cache_.hosts) {
+        cache_.hosts.emplace();
+        // A machine that is no host is asked for none.
+        for (const store::CameraLease& lease :
+             Installation().HostId() == 0 ? std::vector<store::CameraLease>() : store::CameraLeases(Records()).List()) {
+            (*cache_.hosts)[lease.camera_id] = lease.host_id != 0 ? lease.host_id : lease.fixed_host_id;
+        }
+    }
+    const auto host = cache_.hosts->find(camera_id);
+    return host == cache_.hosts->end() ? 0 : host->second;
+}
+
+// As store::Mounts::FindForPlan.
 const store::Mount* RequestContext::MountOf(int camera_id) {
     const auto plan = Plans().find(camera_id);
     const int planned = plan == Plans().end() ? 0 : plan->second.mount_id;
-    const auto mount = std::ranges::find_if(
-        Mounts(), [planned](const store::Mount& each) { return planned != 0 ? each.id == planned : each.is_default; });
-    return mount == Mounts().end() ? nullptr : &*mount;
+    const int host = HostOf(camera_id);
+    const store::Mount* found = nullptr;
+    for (const store::Mount& mount : Mounts()) {
+        const bool may_have = host == 0 || mount.IsOf(host);
+        if (mount.id == planned && may_have) {
+            return &mount;
+        }
+        // Its own comes before one that all hosts share.
+        if (mount.is_default && may_have && (found == nullptr || found->host_id == 0)) {
+            found = &mount;
+        }
+    }
+    return planned != 0 && host == 0 ? nullptr : found;
 }
 
 void RequestContext::CloseRecords() {

@@ -67,6 +67,7 @@ struct RecordCache {
     std::map<store::CameraAccess, std::set<int>> denied_cameras;  // to the caller
     std::optional<std::vector<store::Mount>> mounts;
     std::optional<std::map<int, store::RecordingPlan>> plans;
+    std::optional<std::map<int, int>> hosts;  // of the store, by the camera that each records
 };
 
 // A file can be replaced by another one of the same name, as by restoring a backup.
@@ -108,6 +109,8 @@ class LH_PLATFORM_API RequestContext {
     RecordCache& Cache() { return cache_; }
     const std::vector<store::Mount>& Mounts();
     const std::map<int, store::RecordingPlan>& Plans();
+    // The host of the store that records the camera, or is to; 0 where there are none, and while nobody does.
+    int HostOf(int camera_id);
     // The mount that the camera is recorded to: its plan's, or the default one. Null when there is none.
     const store::Mount* MountOf(int camera_id);
     // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever
