@@ -3,7 +3,7 @@
 // A visit that drags the playhead through recordings and counts the pictures that are drawn: step by step, each waited
 // for, then to and fro for LOOKHAVEN_WATCH_MS. EVENTS are ids of recordings with a second in the middle of each, "7@1772",
 // joined by ",".
-import { address, logIn, report, visit } from "./visit.mjs";
+import { address, dragTo, logIn, report, visit } from "./visit.mjs";
 
 const watchMs = Number(process.env.LOOKHAVEN_WATCH_MS ?? 6000);
 /** The pointer goes so far to either side of the middle. */
@@ -42,12 +42,7 @@ await visit(async (page) => {
     for (; zoomed < 12; zoomed += 1) await page.locator(".timeline-lanes").press("+");
     const axis = await page.locator(".timeline-axis").boundingBox();
     const y = axis.y + 10;
-    /** The second under a pixel of the axis, to which the playhead is dragged. */
-    const secondAt = async (px) => {
-      await page.mouse.move(axis.x + px, y);
-      await page.evaluate(() => new Promise((resolve) => requestAnimationFrame(() => requestAnimationFrame(resolve))));
-      return Number(await page.locator(".timeline-lanes").getAttribute("aria-valuenow"));
-    };
+    const secondAt = (px) => dragTo(page, axis, px);
     await page.mouse.move(axis.x + 100, y);
     await page.mouse.down();
     const [here, there] = [await secondAt(100), await secondAt(500)];

@@ -2,7 +2,7 @@
 //
 // One visit to nine cameras of one moment: in step for a while and after changes of the rate, the playhead dragged, one
 // closed. CAMERAS are their ids, AT is the Unix time in milliseconds to begin at.
-import { address, folder, logIn, report, violations, visit } from "./visit.mjs";
+import { address, dragTo, folder, logIn, report, violations, visit } from "./visit.mjs";
 
 await visit(async (page, complaints) => {
   const all = (state) => page.waitForFunction((wanted) => document.querySelectorAll(`.stage-picture${wanted}`).length === 9, state);
@@ -39,12 +39,7 @@ await visit(async (page, complaints) => {
   for (let press = 0; press < 12; press += 1) await page.locator(".timeline-lanes").press("+");
   const axis = await page.locator(".timeline-axis").boundingBox();
   const y = axis.y + 10;
-  /** The second of the playhead while it is dragged to a pixel of the axis. */
-  const secondAt = async (px) => {
-    await page.mouse.move(axis.x + px, y);
-    await page.evaluate(() => new Promise((resolve) => requestAnimationFrame(() => requestAnimationFrame(resolve))));
-    return Number(await page.locator(".timeline-lanes").getAttribute("aria-valuenow"));
-  };
+  const secondAt = (px) => dragTo(page, axis, px);
   await page.evaluate(() => {
     const time = document.querySelector(".stage-picture.is-large .stage-time");
     window.seen = new Set();

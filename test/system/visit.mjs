@@ -37,6 +37,13 @@ export async function visit(body) {
   }
 }
 
+/** Drags the pointer to a pixel of the timeline's axis, and gives the second of the playhead there. */
+export async function dragTo(page, axis, px) {
+  await page.mouse.move(axis.x + px, axis.y + 10);
+  await page.evaluate(() => new Promise((resolve) => requestAnimationFrame(() => requestAnimationFrame(resolve))));
+  return Number(await page.locator(".timeline-lanes").getAttribute("aria-valuenow"));
+}
+
 export async function logIn(page, word = password) {
   await page.getByLabel("Account").fill("admin");
   await page.getByLabel("Password").fill(word);

@@ -6,6 +6,7 @@ promise, and keeps the state folder then."""
 import argparse
 import collections
 import contextlib
+import errno
 import json
 import os
 import pathlib
@@ -130,9 +131,16 @@ class Torture:
         (self.disk / "filler").unlink()
 
     def remount_disk_read_only(self):
-        subprocess.run(["mount", "-o", "remount,ro", self.disk], capture_output=True, check=False)  # refused while it writes
+        """Laid over itself: the kernel refuses to write-protect a file system while a file on it is open for writing."""
+        subprocess.run(["mount", "--bind", self.disk, self.disk], check=True)
+        subprocess.run(["mount", "-o", "remount,bind,ro", self.disk], check=True)
+        try:
+            (self.disk / "probe").touch()
+            raise AssertionError("the disk can be written")
+        except OSError as error:
+            assert error.errno == errno.EROFS, error
         time.sleep(random.uniform(0.5, 3))
-        subprocess.run(["mount", "-o", "remount,rw", self.disk], check=True)
+        subprocess.run(["umount", "--lazy", self.disk], check=True)
 
     def unplug_disk(self):
         """Away, with all that is on it, and another one in its place."""
