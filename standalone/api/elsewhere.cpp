@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/elsewhere.h"
 
+#include <algorithm>
 #include <optional>
 #include <set>
 #include <string>
@@ -130,8 +131,8 @@ Place PlaceOf(const Call& call, int own_host) {
     return needs_footage ? PlaceOfFootage(call) : Place();
 }
 
-// Who may have a player that does not run here: the host whose stream of it this one forwards; else all that are not
-// away, since another host may forward the stream.
+// Who may have a player that does not run here: the host whose stream of it this one forwards; else all others, since
+// one of them may forward it. Last those without a recorder, which are slow to ask where the machine is off.
 std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_host) {
     std::set<int> away;
     for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(call.context.Installation())) {
@@ -140,9 +141,9 @@ std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_ho
         }
     }
     std::vector<store::Host> hosts = store::Hosts(call.Records()).All();
-    std::erase_if(hosts, [&](const store::Host& host) {
-        return known_host != 0 ? host.id != known_host : host.id == own_host || away.contains(host.id);
-    });
+    std::erase_if(
+        hosts, [&](const store::Host& host) { return known_host != 0 ? host.id != known_host : host.id == own_host; });
+    std::ranges::stable_partition(hosts, [&](const store::Host& host) { return !away.contains(host.id); });
     return hosts;
 }
 
