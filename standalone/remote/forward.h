@@ -48,8 +48,8 @@ class AnswerSink {
 };
 
 // Returns when the answer has ended or the sink has ended it: whether the whole answer came. Throws NoAnswer when none
-// began, after three seconds where there is no such host and after max_head_wait where it says nothing; WrongCertificate;
-// InvalidCertificate; and std::runtime_error when the library cannot be loaded.
+// began, after three seconds where there is no such host and after max_head_wait where it says nothing;
+// WrongCertificate; InvalidCertificate; and std::runtime_error when the library cannot be loaded.
 bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);
 
 }  // namespace lookhaven::remote
