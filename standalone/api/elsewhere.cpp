@@ -143,7 +143,7 @@ std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_ho
     std::vector<store::Host> hosts = store::Hosts(call.Records()).All();
     std::erase_if(
         hosts, [&](const store::Host& host) { return known_host != 0 ? host.id != known_host : host.id == own_host; });
-    std::ranges::stable_partition(hosts, [&](const store::Host& host) { return !away.contains(host.id); });
+    std::stable_partition(hosts.begin(), hosts.end(), [&](const store::Host& host) { return !away.contains(host.id); });
     return hosts;
 }
 
