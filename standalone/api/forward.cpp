@@ -23,7 +23,7 @@ namespace {
 constexpr const char* kTokenHeader = "HTTP_X_LOOKHAVEN_FORWARDED";
 constexpr std::string_view kTokenLine = "X-Lookhaven-Forwarded: ";
 constexpr std::chrono::seconds kMaxSilentLive{60};
-// What lies in buffers of a viewer who cannot keep up is old.
+// Small, since pictures that wait in it grow old where the viewer cannot keep up.
 constexpr int kLiveReceiveBytes = 64 << 10;
 constexpr std::size_t kMaxTagBytes = 100;
 constexpr int kBadGateway = 502;
@@ -72,9 +72,9 @@ remote::ForwardedRequest RequestOf(const Call& call, const store::Host& host, Fo
     return request;
 }
 
-class Passage : public remote::AnswerSink {
+class AnswerForwarder : public remote::AnswerSink {
   public:
-    Passage(const Call& call, Forwarded kind) : call_(call), output_(*call.context.output()), kind_(kind) {}
+    AnswerForwarder(const Call& call, Forwarded kind) : call_(call), output_(*call.context.output()), kind_(kind) {}
 
     bool Begin(const remote::AnswerHead& head) override {
         status_ = head.status;
@@ -106,17 +106,17 @@ class Passage : public remote::AnswerSink {
 
     bool Write(std::span<const char> bytes) override { return Send(bytes); }
 
-    // A viewer who has gone shows only where something is sent.
-    bool GoesOn() override {
+    // Looks at the connection, since a viewer who has gone is otherwise noticed only when something is sent.
+    bool WantsMore() override {
         pollfd viewer{STDOUT_FILENO, POLLRDHUP, 0};
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
     // The other web server's answer while its host is away, or that host's own.
-    bool IsFromNobody() const { return status_ == kBadGateway; }
+    bool IsBadGateway() const { return status_ == kBadGateway; }
     bool IsWithheld() const {
         const bool is_of_player = status_ < 400 || status_ == 400 || status_ == 409;
-        return IsFromNobody() || (kind_ == Forwarded::kControl && status_ == 404) ||
+        return IsBadGateway() || (kind_ == Forwarded::kControl && status_ == 404) ||
                (kind_ == Forwarded::kSearch && !is_of_player);
     }
 
@@ -133,7 +133,7 @@ class Passage : public remote::AnswerSink {
 };
 
 Failure Away(const store::Host& host, const std::string& what, const std::string& why) {
-    base::LogWarning("host " + host.name + " does not answer a request that is passed on to it: " + why);
+    base::LogWarning("host " + host.name + " does not answer a forwarded request: " + why);
     return Failure(503, what + " is on host " + host.name + ", which is away", http::kRetrySoonSeconds);
 }
 
@@ -149,7 +149,7 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
         remote::ClientInForwardToken(token->second, store::Sessions(binding::RequestContext::Current().Records()).Key(),
                                      own_host, base::WallSeconds());
     if (!client) {
-        throw Failure(403, "no host of this installation has passed this request on, or its clock is more than five"
+        throw Failure(403, "no host of this installation has forwarded this request, or its clock is more than five"
                            " minutes off");
     }
     request.headers["REMOTE_ADDR"] = *client;
@@ -159,10 +159,10 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what) {
     const remote::ForwardedRequest request = RequestOf(call, host, kind);
     call.context.CloseRecords();
-    Passage passage(call, kind);
+    AnswerForwarder forwarder(call, kind);
     try {
-        const bool is_whole = remote::Forward({host.address, host.port, host.certificate}, request, passage);
-        if (!is_whole && !passage.IsWithheld() && passage.GoesOn()) {
+        const bool is_whole = remote::Forward({host.address, host.port, host.certificate}, request, forwarder);
+        if (!is_whole && !forwarder.IsWithheld() && forwarder.WantsMore()) {
             base::LogWarning("host " + host.name + " broke off its answer to " + call.api + '/' + call.method);
         }
     } catch (const remote::WrongCertificate&) {
@@ -170,10 +170,10 @@ bool Forward(const Call& call, const store::Host& host, Forwarded kind, const st
     } catch (const std::runtime_error& error) {
         throw Away(host, what, error.what());
     }
-    if (passage.IsFromNobody()) {
+    if (forwarder.IsBadGateway()) {
         throw Away(host, what, "only its web server runs");
     }
-    return !passage.IsWithheld();
+    return !forwarder.IsWithheld();
 }
 
 }  // namespace lookhaven::api

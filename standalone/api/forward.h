@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Passes a call on to another host of the same store, and that host's answer back.
+// Forwards a call to another host of the same store, and that host's answer to the client.
 //
-// Why so        Both hosts have the same accounts, sessions and rights. So the call goes with the caller's own
-//               session, and the other host judges it as if the caller had asked it at first: passing on widens
-//               nothing. It is written anew from what was read of it, never copied, so the two cannot read it
+// Why so        Both hosts have the same accounts, sessions and rights. So the call carries the caller's own session,
+//               and the other host judges it as if the caller had asked there directly: forwarding widens no rights.
+//               The call is composed from its parsed parameters, never copied, so that the two hosts cannot parse it
 //               differently.
-// Invariants    (1) A call that was passed on once is never passed on again, whoever says that it was.
+// Invariants    (1) A forwarded call is never forwarded again, nor is one that only claims to be.
 #pragma once
 
 #include <string>
@@ -17,20 +17,20 @@
 
 namespace lookhaven::api {
 
-// Whether another host has passed the request on; its address is the client's then. Throws Failure 403 where the
-// request says so, and it is not so; store::StoreError.
+// Whether another host has forwarded the request, whose REMOTE_ADDR is then set to the client's. Throws Failure 403
+// where the request claims to be forwarded and its token does not prove it; store::StoreError.
 bool TakeForwarded(http::Request& request, const base::Installation& installation);
 
-// What is passed on.
+// What is forwarded.
 enum class Forwarded {
-    kLive,     // pictures of this moment: a viewer who takes none gets fewer of them
-    kFootage,  // all of it, at whatever pace
+    kLive,     // live pictures: a slow viewer gets fewer of them
+    kFootage,  // every byte, at whatever pace
     kControl,  // steers a player that ran on that host; a 404 is not forwarded
     kSearch,   // steers a player that may run on that host; only what a player answers is forwarded, within seconds
 };
 
-// Sends the answer; false where nothing was sent since the host has no such player, only for the last two. what: names
-// what the host has, e.g. "camera 3", for the error message. Closes the store. Throws Failure 503 where the
+// Sends the answer. False, for kControl and kSearch only: the host has no such player, and nothing was sent. what:
+// names what the host has, such as "camera 3", for the error message. Closes the store. Throws Failure 503 where the
 // host is away.
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what);
 

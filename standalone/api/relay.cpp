@@ -43,7 +43,7 @@ class Relay : public remote::Sink {
     }
 
     // A viewer who has gone shows only where something is sent.
-    bool GoesOn() override {
+    bool WantsMore() override {
         pollfd viewer{STDOUT_FILENO, POLLRDHUP, 0};
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }

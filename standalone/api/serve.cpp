@@ -14,9 +14,9 @@
 
 #include "standalone/admin/change.h"
 #include "standalone/api/decoder_sandbox.h"
-#include "standalone/api/elsewhere.h"
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/forward.h"
+#include "standalone/api/forward_target.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/base/concat.h"
@@ -205,7 +205,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
         ForgetCookies(request, call);
     }
     const Method* method = own == nullptr ? nullptr : &RequireMethod(*own, call);
-    if (IsServedElsewhere(call)) {
+    if (ForwardIfNeeded(call)) {
         return "";
     }
     if (method != nullptr) {

@@ -24,7 +24,7 @@ class Text : public Sink {
         text.append(bytes.begin(), bytes.end());
         return text.size() <= kMaxJsonBytes;
     }
-    bool GoesOn() override { return true; }
+    bool WantsMore() override { return true; }
 
     std::string text;
 };

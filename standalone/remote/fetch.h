@@ -50,7 +50,7 @@ class Sink {
     virtual bool Begin(std::string_view content_type, std::int64_t size) = 0;
     virtual bool Write(std::span<const char> bytes) = 0;
     // Asked at least once a second, also while nothing comes.
-    virtual bool GoesOn() = 0;
+    virtual bool WantsMore() = 0;
 };
 
 // Returns when the live view has ended or the sink has ended it. Throws NoAnswer when none began; InvalidCertificate;

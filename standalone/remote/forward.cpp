@@ -22,8 +22,8 @@ constexpr long kConnectMillis = 3'000;
 constexpr long kKeepAliveSeconds = 5;
 constexpr unsigned int kMaxUnansweredMillis = 20'000;
 constexpr std::size_t kMaxHeaderBytes = 1'000;
-constexpr const char* kPassedOn[] = {"Cache-Control", "Content-Disposition", "ETag", "Retry-After",
-                                     "Vary",          "X-Capture-Time"};
+constexpr const char* kForwardedHeaders[] = {"Cache-Control", "Content-Disposition", "ETag", "Retry-After",
+                                             "Vary",          "X-Capture-Time"};
 constexpr int kFound = 302;
 constexpr int kNotModified = 304;
 
@@ -32,20 +32,20 @@ bool IsPlain(std::string_view text) {
            std::ranges::all_of(text, [](char character) { return character >= ' ' && character <= '~'; });
 }
 
-// Without scheme and host, which the web server there may have put in front.
+// Without scheme and host, which that host's web server may have added.
 std::string PathOf(std::string_view location) {
     if (const std::size_t scheme_end = location.find("://"); scheme_end != location.npos) {
         location.remove_prefix(std::min(location.find('/', scheme_end + 3), location.size()));
     }
-    // "//name" would lead to another host, and what is no path anywhere.
+    // "//name" would lead to another host, as would "/\name" in a browser.
     const bool is_path =
         location.starts_with('/') && !location.starts_with("//") && location.find('\\') == location.npos;
     return is_path && IsPlain(location) ? std::string(location) : "";
 }
 
-class Passage {
+class ForwardedTransfer {
   public:
-    Passage(const Host& host, const ForwardedRequest& request, AnswerSink& sink)
+    ForwardedTransfer(const Host& host, const ForwardedRequest& request, AnswerSink& sink)
         : sink_(sink),
           receive_bytes_(request.receive_bytes),
           max_head_wait_(request.max_head_wait),
@@ -58,12 +58,12 @@ class Passage {
         handle_.Set(CURLOPT_TCP_KEEPALIVE, 1L);
         handle_.Set(CURLOPT_TCP_KEEPIDLE, kKeepAliveSeconds);
         handle_.Set(CURLOPT_TCP_KEEPINTVL, kKeepAliveSeconds);
-        handle_.Set(CURLOPT_SOCKOPTFUNCTION, &Passage::OnSocket);
+        handle_.Set(CURLOPT_SOCKOPTFUNCTION, &ForwardedTransfer::OnSocket);
         handle_.Set(CURLOPT_SOCKOPTDATA, this);
-        handle_.Set(CURLOPT_WRITEFUNCTION, &Passage::OnBytes);
+        handle_.Set(CURLOPT_WRITEFUNCTION, &ForwardedTransfer::OnBytes);
         handle_.Set(CURLOPT_WRITEDATA, this);
         handle_.Set(CURLOPT_NOPROGRESS, 0L);
-        handle_.Set(CURLOPT_XFERINFOFUNCTION, &Passage::OnProgress);
+        handle_.Set(CURLOPT_XFERINFOFUNCTION, &ForwardedTransfer::OnProgress);
         handle_.Set(CURLOPT_XFERINFODATA, this);
     }
 
@@ -95,8 +95,8 @@ class Passage {
 
     AnswerHead Head() const {
         const long status = handle_.Status();
-        const bool is_redirect = status >= 300 && status != kNotModified;
-        if (status < 200 || status > 599 || (is_redirect && status < 400 && status != kFound)) {
+        const bool is_foreign_redirect = status >= 300 && status < 400 && status != kFound && status != kNotModified;
+        if (status < 200 || status > 599 || is_foreign_redirect) {
             throw NoAnswer("it answers with status " + std::to_string(status), status);
         }
         AnswerHead head;
@@ -105,7 +105,7 @@ class Passage {
         if (const std::string type = handle_.ContentType(); IsPlain(type)) {
             head.content_type = type;
         }
-        for (const char* name : kPassedOn) {
+        for (const char* name : kForwardedHeaders) {
             if (std::string value = handle_.Header(name); !value.empty() && IsPlain(value)) {
                 head.headers.emplace_back(name, std::move(value));
             }
@@ -132,25 +132,25 @@ class Passage {
 
     // No exception may pass through libcurl.
     static std::size_t OnBytes(char* bytes, std::size_t size, std::size_t count, void* self) {
-        Passage& passage = *static_cast<Passage*>(self);
+        ForwardedTransfer& transfer = *static_cast<ForwardedTransfer*>(self);
         try {
-            return passage.Take({bytes, size * count}) ? size * count : CURL_WRITEFUNC_ERROR;
+            return transfer.Take({bytes, size * count}) ? size * count : CURL_WRITEFUNC_ERROR;
         } catch (const std::exception& error) {
-            passage.problem_ = error.what();
+            transfer.problem_ = error.what();
             return CURL_WRITEFUNC_ERROR;
         }
     }
 
     static int OnProgress(void* self, curl_off_t, curl_off_t, curl_off_t, curl_off_t) {
-        Passage& passage = *static_cast<Passage*>(self);
-        passage.is_late_ = !passage.has_begun_ && Clock::now() - passage.began_ > passage.max_head_wait_;
-        passage.is_ended_by_sink_ = passage.is_ended_by_sink_ || !passage.sink_.GoesOn();
-        return passage.is_late_ || passage.is_ended_by_sink_ ? 1 : 0;
+        ForwardedTransfer& transfer = *static_cast<ForwardedTransfer*>(self);
+        transfer.is_late_ = !transfer.has_begun_ && Clock::now() - transfer.began_ > transfer.max_head_wait_;
+        transfer.is_ended_by_sink_ = transfer.is_ended_by_sink_ || !transfer.sink_.WantsMore();
+        return transfer.is_late_ || transfer.is_ended_by_sink_ ? 1 : 0;
     }
 
     static int OnSocket(void* self, curl_socket_t socket, curlsocktype) {
         ::setsockopt(socket, IPPROTO_TCP, TCP_USER_TIMEOUT, &kMaxUnansweredMillis, sizeof kMaxUnansweredMillis);
-        if (const int bytes = static_cast<Passage*>(self)->receive_bytes_; bytes > 0) {
+        if (const int bytes = static_cast<ForwardedTransfer*>(self)->receive_bytes_; bytes > 0) {
             ::setsockopt(socket, SOL_SOCKET, SO_RCVBUF, &bytes, sizeof bytes);
         }
         return CURL_SOCKOPT_OK;
@@ -173,5 +173,5 @@ class Passage {
 
 bool LookhavenForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
                       lookhaven::remote::AnswerSink& sink) {
-    return lookhaven::remote::Passage(host, request, sink).Run();
+    return lookhaven::remote::ForwardedTransfer(host, request, sink).Run();
 }

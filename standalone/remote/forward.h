@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Has another host that shares this one's store answer a request, and takes its answer as it comes.
+// Forwards a request to another host of the same store, and takes its answer as it arrives.
 //
 // Invariants    (1) Of the answer's headers only those that say what its body is, for how long it may be kept, and when
-//                   to ask again are told; each is printable ASCII of bounded length. None may set a cookie, or steer
-//                   the web server or the browser.
+//                   to ask again are taken over; each is printable ASCII of bounded length. None may set a cookie, or
+//                   steer the web server or the browser.
 #pragma once
 
 #include <chrono>
@@ -24,7 +24,7 @@ struct ForwardedRequest {
     std::string json;                        // the body
     std::chrono::seconds max_head_wait{28};  // less than this host gives a request process for its answer
     std::chrono::seconds max_silent{};       // without a byte from that host; 0: for as long as the connection stands
-    int receive_bytes = 0;                   // of the connection's buffer; 0: as many as are good for it
+    int receive_bytes = 0;                   // of the connection's buffer; 0: the system's default
 };
 
 struct AnswerHead {
@@ -35,7 +35,7 @@ struct AnswerHead {
     std::int64_t size_bytes = -1;  // of the body; -1: not known
 };
 
-// Takes an answer as it comes. What returns false ends it.
+// Takes an answer as it arrives. A function that returns false ends it.
 class AnswerSink {
   public:
     virtual ~AnswerSink() = default;
@@ -43,11 +43,11 @@ class AnswerSink {
     // Once, also for an answer without a body.
     virtual bool Begin(const AnswerHead& head) = 0;
     virtual bool Write(std::span<const char> bytes) = 0;
-    // Asked at least once a second, also while nothing comes.
-    virtual bool GoesOn() = 0;
+    // Asked at least once a second, also while nothing arrives.
+    virtual bool WantsMore() = 0;
 };
 
-// Returns when the answer has ended or the sink has ended it: whether the whole answer came. Throws NoAnswer when none
+// Returns when the answer has ended, or the sink has ended it: whether it is complete. Throws NoAnswer when none
 // began, after three seconds where there is no such host and after max_head_wait where it says nothing;
 // WrongCertificate; InvalidCertificate; and std::runtime_error when the library cannot be loaded.
 bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);

@@ -125,7 +125,7 @@ class Transfer {
     }
 
     static int OnProgress(void* self, curl_off_t, curl_off_t, curl_off_t, curl_off_t) {
-        return static_cast<Transfer*>(self)->sink_.GoesOn() ? 0 : 1;
+        return static_cast<Transfer*>(self)->sink_.WantsMore() ? 0 : 1;
     }
 
     static int OnSocket(void*, curl_socket_t socket, curlsocktype) {

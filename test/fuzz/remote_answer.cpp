@@ -38,7 +38,7 @@ class Viewer : public remote::Sink {
         text.append(bytes.data(), bytes.size());
         return true;
     }
-    bool GoesOn() override { return true; }
+    bool WantsMore() override { return true; }
 
     std::string text;
 

@@ -103,7 +103,7 @@ class HostsTest(unittest.TestCase):
                 # The head of a downloaded file has numbers of its own.
                 begin = 4096 if query["method"] == "Download" else 0
                 self.assertEqual((passed.status, len(passed.body)), (direct.status, len(direct.body)))
-                self.assertTrue(passed.body[begin:] == direct.body[begin:], "what is passed on is not changed")
+                self.assertTrue(passed.body[begin:] == direct.body[begin:], "what is forwarded is not changed")
                 told = [{name: answer.headers[name] for name in kept} for answer in (direct, passed)]
                 if told[0]["Location"]:  # the web servers put themselves in front
                     for each, server in zip(told, (self.owner, self.other)):
@@ -178,7 +178,7 @@ class HostsTest(unittest.TestCase):
                     self.assertEqual((passed.status, passed.body.replace(b"%d" % self.other.port, b"")),
                                      (direct.status, direct.body.replace(b"%d" % self.owner.port, b"")))
         after = (self.owner.home / "log/access.log").read_text()
-        self.assertNotIn("POST", after[len(before):], "none of it was passed on")
+        self.assertNotIn("POST", after[len(before):], "none of it was forwarded")
 
     def test_what_says_that_it_was_passed_on_is_never_passed_on(self):
         snapshot = call(LIVE, "Play", camera=1, snapshot=1)

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/api/elsewhere.h"
+#include "standalone/api/forward_target.h"
 
 #include <algorithm>
 #include <optional>
@@ -23,7 +23,7 @@ namespace {
 
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
-// What a call needs that one host has alone.
+// What a call needs that only one host has.
 struct Place {
     int host_id = 0;  // 0: any
     Forwarded kind = Forwarded::kFootage;
@@ -41,14 +41,14 @@ bool IsLive(const Call& call) {
     return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get");
 }
 
-// A paired host has no session; whoever is neither is refused by this host's handler.
+// By a session, or as a paired host. Anyone else is refused by this host's handler.
 bool IsAdmitted(const Call& call) {
     const auto timestamp = call.cookies.find("timestamp");
     return call.login || (timestamp != call.cookies.end() && call.Parameter("cookie").isString() &&
                           IsAuthPairMatch(call.Parameter("cookie").asString(), timestamp->second));
 }
 
-// The host that records the camera, else the one that is to.
+// The host that records the camera, else the one that is configured to.
 int HostOfCamera(store::Store& records, int camera_id) {
     const int recording = store::Hosts(records).HostOfCamera(camera_id);
     const auto camera = recording == 0 ? store::Cameras(records).Find(camera_id) : std::nullopt;
@@ -131,8 +131,8 @@ Place PlaceOf(const Call& call, int own_host) {
     return needs_footage ? PlaceOfFootage(call) : Place();
 }
 
-// Who may have a player that does not run here: the host whose stream of it this one forwards; else all others, since
-// one of them may forward it. Last those without a recorder, which are slow to ask where the machine is off.
+// The hosts that may have a player that does not run here: the one whose stream of it this host forwards, else all
+// others. Those without a recorder come last: where the machine is off, asking it is slow.
 std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_host) {
     std::set<int> away;
     for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(call.context.Installation())) {
@@ -147,8 +147,8 @@ std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_ho
     return hosts;
 }
 
-// Steers the player at the host where it runs.
-bool IsControlledElsewhere(const Call& call, int own_host) {
+// Steers the player at the host where it runs; false where no other host has it.
+bool ForwardControl(const Call& call, int own_host) {
     const Json::Value& key = call.Parameter("timestamp");
     if (!key.isInt64() || key.asInt64() < 1 || call.is_forwarded ||
         call.slots.FindPlayer(call.context.Session(), key.asInt64())) {
@@ -172,7 +172,7 @@ bool IsControlledElsewhere(const Call& call, int own_host) {
 
 }  // namespace
 
-bool IsServedElsewhere(const Call& call) {
+bool ForwardIfNeeded(const Call& call) {
     const bool steers_player = call.api == kPlaybackApi.name;
     if (!steers_player && !IsLive(call) && !IsPlayer(call) && call.api != kPictureApi.name &&
         call.api != kEventApi.name) {
@@ -183,7 +183,7 @@ bool IsServedElsewhere(const Call& call) {
         return false;
     }
     if (steers_player) {
-        return IsControlledElsewhere(call, own_host);
+        return ForwardControl(call, own_host);
     }
     const Place place = PlaceOf(call, own_host);
     if (place.host_id == 0 || place.host_id == own_host) {
