@@ -16,8 +16,8 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr int kMaxRate = 16;
-constexpr int kMinRate = -8;
+constexpr int kFastestPlaybackRate = 16;
+constexpr int kSlowestPlaybackRate = -8;
 constexpr std::chrono::milliseconds kPoll{2};
 constexpr std::chrono::milliseconds kSignalLimit{1'000};
 constexpr std::chrono::milliseconds kOpenLimit{1'000};
@@ -92,7 +92,7 @@ control::SharedLock LockPlayers(const Call& call) {
 std::string SetRate(const Call& call) {
     const Json::Value& asked = call.Parameter("rate");
     const int rate = asked.isInt() ? asked.asInt() : 0;
-    if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
+    if (rate < kSlowestPlaybackRate || rate > kFastestPlaybackRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 16");
     }
     const control::RequestRef player_request = AwaitPlayer(call);

@@ -40,13 +40,13 @@ using Clock = std::chrono::steady_clock;
 constexpr std::chrono::seconds kLead{2};
 constexpr std::chrono::milliseconds kPoll{50};
 constexpr std::chrono::milliseconds kTailPoll{100};
-constexpr std::int64_t kMinRate = -8;
-constexpr std::int64_t kMaxRate = 4;
+constexpr std::int64_t kSlowestStreamRate = -8;
+constexpr std::int64_t kFastestStreamRate = 4;
 
 // As a multiple of real time.
 double SpeedOf(const Call& call) {
     const std::int64_t rate = call.NumberOr("rate", 1);
-    if (rate < kMinRate || rate > kMaxRate || (rate > -2 && rate < 1)) {
+    if (rate < kSlowestStreamRate || rate > kFastestStreamRate || (rate > -2 && rate < 1)) {
         throw Failure(400, "rate must be from -8 to -2 or from 1 to 4");
     }
     return rate < 0 ? -1.0 / static_cast<double>(rate) : static_cast<double>(rate);

@@ -28,8 +28,8 @@ namespace {
 constexpr std::int64_t kRepeatUs = 200'000;
 constexpr std::int64_t kTailWaitUs = 2'000'000;
 constexpr std::int64_t kTailPollUs = 20'000;
-constexpr float kMinRate = 1.0F;
-constexpr float kMaxRate = 1000.0F;
+constexpr float kMinFramesPerSecond = 1.0F;
+constexpr float kMaxFramesPerSecond = 1000.0F;
 
 // False when a signal came first.
 bool SleepUntil(std::int64_t due_us) {
@@ -120,7 +120,7 @@ int JpegExtractor::GetFrameInfo(__tag_JPEG_FRAME_INFO& info) {
         if (!std::isfinite(rate)) {
             return -1;
         }
-        info.m_FrameRate = std::clamp(rate, kMinRate, kMaxRate);
+        info.m_FrameRate = std::clamp(rate, kMinFramesPerSecond, kMaxFramesPerSecond);
         info.m_FrameCount = m_pRecording->frames.FrameCount();
         return 0;
     });

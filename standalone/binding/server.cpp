@@ -113,7 +113,7 @@ bool IsAuthPairMatch(const std::string& cookie, const std::string& timestamp) {
     const std::string shared = OrFailure("IsAuthPairMatch", std::string(), [&] {
         const std::int64_t now = UtcSeconds();
         std::string found;
-        for (const std::string& secret : Servers().SecretsOfPairedHosts()) {
+        for (const std::string& secret : Servers().InboundPeerSecrets()) {
             if (remote::PairTokenMatches(cookie, timestamp, secret, now)) {
                 found = secret;
             }

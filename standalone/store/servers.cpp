@@ -224,7 +224,7 @@ std::string RecordingServers::FindSecret(int id) {
         .value_or("");
 }
 
-std::vector<std::string> RecordingServers::SecretsOfPairedHosts() {
+std::vector<std::string> RecordingServers::InboundPeerSecrets() {
     return connection_.FetchAll<std::string>("select secret from servers where enabled = 1 and address = ''"
                                              " order by id");
 }

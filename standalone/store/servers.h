@@ -50,7 +50,7 @@ struct ServerDenial {
 std::uint64_t PairingId(const std::string& secret);
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.
-//               (2) A secret comes out of SecretsOfPairedHosts and FindSecret alone, never with the record.
+//               (2) A secret comes out of InboundPeerSecrets and FindSecret alone, never with the record.
 class RecordingServers {
   public:
     // The store must outlive this object.
@@ -80,7 +80,7 @@ class RecordingServers {
     std::string FindSecret(int id);
     // Of the enabled hosts without an address: hosts that connect to this one. The secret of a host that this host
     // connects to admits nobody here.
-    std::vector<std::string> SecretsOfPairedHosts();
+    std::vector<std::string> InboundPeerSecrets();
     // Of all enabled hosts, whichever side connects.
     std::set<std::uint64_t> Pairings();
 

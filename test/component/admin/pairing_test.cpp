@@ -95,7 +95,7 @@ class Pairing : public store::StoreTest {
     static std::string Try(store::Store& store, const std::string& secret, const base::BootTime& now = At(0)) {
         try {
             const std::string shared = AcceptInvitation(store, secret, "192.0.2.9", now);
-            return store::RecordingServers(store).SecretsOfPairedHosts().back() == shared ? "paired" : "";
+            return store::RecordingServers(store).InboundPeerSecrets().back() == shared ? "paired" : "";
         } catch (const InvalidInvitation&) {
             return "invalid";
         } catch (const store::AlreadyExists&) {

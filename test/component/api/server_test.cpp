@@ -78,7 +78,7 @@ TEST_F(ServerApi, ACodeIsTakenOnceAndGuessingIsBounded) {
     const Answer accepted = Accept(secret, "2001:db8::3");  // who shares their network is not kept out
     ASSERT_EQ(accepted.status, 200) << accepted.body;
     EXPECT_EQ(accepted.Json()["data"]["secret"].asString(),
-              store::RecordingServers(store_).SecretsOfPairedHosts().front());
+              store::RecordingServers(store_).InboundPeerSecrets().front());
     EXPECT_TRUE(accepted.Json()["data"]["camera"].isArray());
     EXPECT_EQ(Accept(secret, "192.0.2.1").status, 403);
     EXPECT_THAT(Log("refused-log-ins.log"),

@@ -172,13 +172,13 @@ TEST_P(EmapTest, AStateIsOneThatTheDeviceHasAndKnowsSinceWhen) {
 
 TEST_P(EmapTest, AServersRecordNeverHoldsItsSecret) {
     const int server = AddServer();
-    EXPECT_THAT(servers_.SecretsOfPairedHosts(), IsEmpty()) << "a server that this host connects to";
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "a server that this host connects to";
     RecordingServer connecting{.name = "Connects to this host"};
     connecting.id = servers_.Add(connecting, kSecret);
-    EXPECT_THAT(servers_.SecretsOfPairedHosts(), ElementsAre(kSecret));
+    EXPECT_THAT(servers_.InboundPeerSecrets(), ElementsAre(kSecret));
     connecting.enabled = false;
     servers_.Update(connecting);
-    EXPECT_THAT(servers_.SecretsOfPairedHosts(), IsEmpty()) << "disabled";
+    EXPECT_THAT(servers_.InboundPeerSecrets(), IsEmpty()) << "disabled";
     RecordingServer changed = *servers_.Find(server);
     changed.enabled = false;
     servers_.Update(changed, std::string(64, 'b'));
