@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/cli/settings_file.h"
+#include "standalone/cli/configuration_file.h"
 
 #include <algorithm>
 #include <array>
@@ -86,7 +86,7 @@ std::string_view NotANetwork(std::string_view words) {
 
 }  // namespace
 
-void CheckSettingsFile(const std::string& path) {
+void CheckConfigurationFile(const std::string& path) {
     std::ifstream file(path);
     Values values = kDefaults;
     int number = 0;

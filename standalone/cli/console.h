@@ -28,7 +28,7 @@ enum ExitCode : int {
     kOsError = 71,
     kCannotCreate = 73,
     kNoPermission = 77,
-    kConfigError = 78,  // store's schema or settings file not valid for this program
+    kConfigError = 78,  // store's schema or configuration file not valid for this program
 };
 
 using base::Concat;

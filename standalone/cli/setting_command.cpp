@@ -6,7 +6,7 @@
 #include "standalone/admin/settings.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
-#include "standalone/cli/settings_file.h"
+#include "standalone/cli/configuration_file.h"
 #include "standalone/cli/table.h"
 #include "standalone/store/settings.h"
 
@@ -22,7 +22,7 @@ struct Request {
 };
 
 struct CheckRequest {
-    std::string file = kSettingsFile;
+    std::string file = kConfigurationFile;
 };
 
 // "on", "off", a number or folders; of a token, whether there is one.
@@ -70,8 +70,8 @@ void SetMonitorToken(const Console& console, const Request& request) {
 }
 
 void Check(const Console& console, const CheckRequest& request) {
-    CheckSettingsFile(request.file);
-    console.Answer(Object("file", request.file), "The settings in ", request.file, " are valid.");
+    CheckConfigurationFile(request.file);
+    console.Answer(Object("file", request.file), "All keys in ", request.file, " are valid.");
 }
 
 }  // namespace
@@ -80,8 +80,8 @@ void AddSetting(CLI::App& program, const Console& console) {
     CommandGroup<> group(program, console, "setting", "Settings of the whole installation");
     group.Add("show", "Shows all settings", Show);
     CommandGroup<CheckRequest> check(group.app(), console);
-    check.Add("check", "Checks the settings of the installed services", Check)
-        .Option("file", check.request().file, std::string("The file (default: ") + kSettingsFile + ")");
+    check.Add("check", "Checks the configuration file of the installed services", Check)
+        .Option("file", check.request().file, std::string("The file (default: ") + kConfigurationFile + ")");
     CommandGroup<Request> set(group.app(), console, "set", "Changes a setting");
     for (const admin::Setting& setting : admin::Settings()) {
         if (setting.kind == admin::Setting::Kind::kNumber) {
