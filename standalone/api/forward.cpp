@@ -112,7 +112,7 @@ class AnswerForwarder : public remote::AnswerSink {
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
-    // The other web server's answer while its host is away, or that host's own.
+    // The other web server's answer while its host is offline, or that host's own.
     bool IsBadGateway() const { return status_ == kBadGateway; }
     bool IsWithheld() const {
         const bool is_of_player = status_ < 400 || status_ == 400 || status_ == 409;
@@ -132,9 +132,9 @@ class AnswerForwarder : public remote::AnswerSink {
     int status_ = 0;
 };
 
-Failure Away(const store::Host& host, const std::string& what, const std::string& why) {
+Failure Offline(const store::Host& host, const std::string& what, const std::string& why) {
     base::LogWarning("host " + host.name + " does not answer a forwarded request: " + why);
-    return Failure(503, what + " is on host " + host.name + ", which is away", http::kRetrySoonSeconds);
+    return Failure(503, what + " is on host " + host.name + ", which is offline", http::kRetrySoonSeconds);
 }
 
 }  // namespace
@@ -166,12 +166,12 @@ bool Forward(const Call& call, const store::Host& host, Forwarded kind, const st
             base::LogWarning("host " + host.name + " broke off its answer to " + call.api + '/' + call.method);
         }
     } catch (const remote::WrongCertificate&) {
-        throw Away(host, what, "it shows another certificate than the one it was added with, or an expired one");
+        throw Offline(host, what, "it shows another certificate than the one it was added with, or an expired one");
     } catch (const std::runtime_error& error) {
-        throw Away(host, what, error.what());
+        throw Offline(host, what, error.what());
     }
     if (forwarder.IsBadGateway()) {
-        throw Away(host, what, "only its web server runs");
+        throw Offline(host, what, "only its web server runs");
     }
     return !forwarder.IsWithheld();
 }

@@ -31,7 +31,7 @@ enum class Forwarded {
 
 // Sends the answer. False, for kControl and kSearch only: the host has no such player, and nothing was sent. what:
 // names what the host has, such as "camera 3", for the error message. Closes the store. Throws Failure 503 where the
-// host is away.
+// host is offline.
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what);
 
 }  // namespace lookhaven::api

@@ -13,7 +13,7 @@ namespace lookhaven::api {
 
 // False where this host answers the call itself, also where the caller may not have what it asks for: the refusal is
 // the same everywhere. True when another host has answered it on standard output. Only for an admitted call. Throws
-// Failure: 503 where that host is away, or the call was forwarded to the wrong one; 409 where parts of what is to be
+// Failure: 503 where that host is offline, or the call was forwarded to the wrong one; 409 where parts of what is to be
 // exported lie on several hosts.
 bool ForwardIfNeeded(const Call& call);
 

@@ -73,7 +73,7 @@ std::string List(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// Apart from List, since a host that is away costs ten seconds.
+// Apart from List, since a host that is offline costs ten seconds.
 std::string Check(const Call& call) {
     RecordingServers servers(call.Records());
     const auto server = servers.Find(IdIn(call, "id"));

@@ -13,7 +13,7 @@ namespace lookhaven::maintenance {
 
 namespace {
 
-constexpr std::array kNames{"here", "there", "away"};
+constexpr std::array kNames{"local", "online", "offline"};
 
 std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "hosts";

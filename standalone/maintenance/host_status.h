@@ -3,10 +3,10 @@
 // Reports the hosts that share the store, as this host's recorder sees them, to the operator: the file "hosts" in the
 // run folder, one line per host, replaced as a whole when something changes:
 //
-//   2 away 12
-//   <host> <here|there|away> <cameras whose lease it has>
+//   2 offline 12
+//   <host> <local|online|offline> <cameras whose lease it has>
 //
-// Why so        Whether a heartbeat stands still can only be told by who watches it for a while.
+// Why so        Only a process that watches a heartbeat for a while can tell whether it still changes.
 #pragma once
 
 #include <vector>
@@ -16,16 +16,16 @@
 namespace lookhaven::maintenance {
 
 enum class HostState {
-    kHere,   // this one
-    kThere,  // its recorder runs and reaches the store
-    kAway,   // it does not, and has not for a while
+    kLocal,    // this one
+    kOnline,   // its recorder runs and reaches the store
+    kOffline,  // it does not, and has not for a while
 };
 
-const char* NameOf(HostState state);  // "here", "there", "away"
+const char* NameOf(HostState state);  // "local", "online", "offline"
 
 struct HostStatus {
     int host = 0;
-    HostState state = HostState::kThere;
+    HostState state = HostState::kOnline;
     int cameras = 0;
 
     bool operator==(const HostStatus&) const = default;

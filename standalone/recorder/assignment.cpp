@@ -8,7 +8,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// A gap between two looks at the store longer than away_us / kMaxGapPart starts every host's timer anew.
+// A gap between two looks at the store longer than offline_us / kMaxGapPart starts every host's timer anew.
 constexpr std::int64_t kMaxGapPart = 3;
 
 class Sharing {
@@ -25,7 +25,7 @@ class Sharing {
         }
     }
 
-    bool IsThere(int host) const { return hosts_.contains(host) && hosts_.at(host).is_there; }
+    bool IsOnline(int host) const { return hosts_.contains(host) && hosts_.at(host).is_online; }
     bool Runs(int host) const { return hosts_.contains(host) && hosts_.at(host).runs; }
     bool Takes(int host) const { return hosts_.contains(host) && hosts_.at(host).takes; }
     bool AnotherTakes(int host) const {
@@ -33,8 +33,8 @@ class Sharing {
                                    [host](const auto& entry) { return entry.first != host && entry.second.takes; });
     }
 
-    // Nobody has it, or who has it is away.
-    bool IsFree(const store::CameraLease& camera) const { return !IsThere(camera.host_id); }
+    // Nobody has it, or its holder is offline.
+    bool IsFree(const store::CameraLease& camera) const { return !IsOnline(camera.host_id); }
 
     bool MustGive(int own, const store::CameraLease& camera) const {
         if (!camera.enabled) {
@@ -77,7 +77,7 @@ class Sharing {
 }  // namespace
 
 void HostWatch::Observe(const std::vector<store::Host>& hosts, std::int64_t now_us) {
-    const bool is_gap = now_us - observed_us_ > away_us_ / kMaxGapPart;
+    const bool is_gap = now_us - observed_us_ > offline_us_ / kMaxGapPart;
     observed_us_ = now_us;
     std::map<int, Heartbeat> seen;
     for (const store::Host& host : hosts) {
@@ -88,9 +88,9 @@ void HostWatch::Observe(const std::vector<store::Host>& hosts, std::int64_t now_
     heartbeats_ = std::move(seen);
 }
 
-bool HostWatch::IsThere(int host) const {
+bool HostWatch::IsOnline(int host) const {
     const auto known = heartbeats_.find(host);
-    return known != heartbeats_.end() && observed_us_ - known->second.changed_us < away_us_;
+    return known != heartbeats_.end() && observed_us_ - known->second.changed_us < offline_us_;
 }
 
 Assignment Assign(int own, const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {

@@ -8,7 +8,7 @@
 // Invariants    (1) A camera that is fixed to a host is taken by that host alone.
 //               (2) Nothing is given away that nobody is there to take: recording by the wrong host is better than
 //                   none.
-//               (3) A floating camera moves when its holder is away, drains, or an operator moved it, and never
+//               (3) A floating camera moves when its holder is offline, drains, or an operator moved it, and never
 //                   otherwise.
 #pragma once
 
@@ -21,20 +21,20 @@
 
 namespace lookhaven::recorder {
 
-// Which hosts are away, by this process's own clock.
+// Which hosts are offline, by this process's own clock.
 //
-// Why so        While the store is away from everybody no heartbeat changes, and the one that reaches it first
+// Why so        While the store is unreachable for everybody no heartbeat changes, and the one that reaches it first
 //               afterwards must not take everybody else for silent. So only time through which this process itself
 //               saw the store counts.
 class HostWatch {
   public:
-    // away_us: how long a heartbeat stands still until its host counts as away.
-    explicit HostWatch(std::int64_t away_us) : away_us_(away_us) {}
+    // offline_us: how long a heartbeat stands still until its host counts as offline.
+    explicit HostWatch(std::int64_t offline_us) : offline_us_(offline_us) {}
 
-    // Call every second while the store can be reached. A host that was not seen before counts as there.
+    // Call every second while the store can be reached. A host that was not seen before counts as online.
     void Observe(const std::vector<store::Host>& hosts, std::int64_t now_us);
     // As of the last Observe; false for an unknown host.
-    bool IsThere(int host) const;
+    bool IsOnline(int host) const;
 
   private:
     struct Heartbeat {
@@ -42,21 +42,21 @@ class HostWatch {
         std::int64_t changed_us = 0;
     };
 
-    const std::int64_t away_us_;
+    const std::int64_t offline_us_;
     std::int64_t observed_us_ = 0;
     std::map<int, Heartbeat> heartbeats_;
 };
 
 struct AssignedHost {
     int id = 0;
-    bool is_there = false;  // what it has is its own
-    bool runs = false;      // as far as can be told; it may have been stopped a moment ago and start again
-    bool takes = false;     // floating cameras: it runs, has a mount to record to, and does not drain
-    bool gives = false;     // its floating cameras, where another host takes them
+    bool is_online = false;  // what it has is its own
+    bool runs = false;       // as far as can be told; it may have been stopped a moment ago and start again
+    bool takes = false;      // floating cameras: it runs, has a mount to record to, and does not drain
+    bool gives = false;      // its floating cameras, where another host takes them
 };
 
 struct Assignment {
-    std::vector<store::CameraLease> take;  // leases that nobody has, or a host that is away
+    std::vector<store::CameraLease> take;  // leases that nobody has, or a host that is offline
     std::vector<int> give;                 // cameras whose lease is this host's
 };
 

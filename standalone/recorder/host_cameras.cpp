@@ -20,12 +20,12 @@ std::int64_t HeartbeatOf(const std::vector<store::Host>& hosts, int id) {
 
 }  // namespace
 
-HostCameras::HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t away_us)
+HostCameras::HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us)
     : installation_(installation),
       rows_(rows),
       own_(installation.HostId()),
-      away_us_(away_us),
-      watch_(away_us),
+      offline_us_(offline_us),
+      watch_(offline_us),
       thread_(installation.StoreUrl(), "share the cameras with the other hosts",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -91,7 +91,7 @@ void HostCameras::Work(store::Store& store) {
             held.insert(camera.camera_id);
             base::LogInfo(
                 "has taken camera " + std::to_string(camera.camera_id) +
-                (camera.host_id == 0 ? "" : " from host " + std::to_string(camera.host_id) + ", which is away"));
+                (camera.host_id == 0 ? "" : " from host " + std::to_string(camera.host_id) + ", which is offline"));
         }
     }
     Publish(std::move(held));
@@ -102,14 +102,14 @@ std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& a
     watch_.Observe(all, base::MonotonicMicros());
     std::vector<AssignedHost> hosts;
     for (const store::Host& host : all) {
-        const bool is_there = host.id == own_ || watch_.IsThere(host.id);
-        const bool runs = host.id == own_ || (is_there && !host.recorder.empty());
+        const bool is_online = host.id == own_ || watch_.IsOnline(host.id);
+        const bool runs = host.id == own_ || (is_online && !host.recorder.empty());
         const bool has_room = host.id == own_ ? has_room_.load() : host.has_room;
         // Not at once: its mounts may not have been looked at yet, or be back in a moment.
         const std::int64_t since_us = no_room_since_us_;
-        const bool lacks_room = host.id == own_ && since_us != 0 && base::MonotonicMicros() - since_us > away_us_;
+        const bool lacks_room = host.id == own_ && since_us != 0 && base::MonotonicMicros() - since_us > offline_us_;
         hosts.push_back({.id = host.id,
-                         .is_there = is_there,
+                         .is_online = is_online,
                          .runs = runs,
                          .takes = runs && has_room && !host.draining,
                          .gives = host.draining || lacks_room});
@@ -151,9 +151,9 @@ void HostCameras::Report(const std::vector<AssignedHost>& hosts, const std::vect
     for (const AssignedHost& host : hosts) {
         const auto count = std::ranges::count(cameras, host.id, &store::CameraLease::host_id);
         states.push_back({host.id,
-                          host.id == own_ ? maintenance::HostState::kHere
-                          : host.is_there ? maintenance::HostState::kThere
-                                          : maintenance::HostState::kAway,
+                          host.id == own_  ? maintenance::HostState::kLocal
+                          : host.is_online ? maintenance::HostState::kOnline
+                                           : maintenance::HostState::kOffline,
                           static_cast<int>(count)});
     }
     if (states != reported_) {

@@ -2,7 +2,7 @@
 //
 // The cameras that this host records, where several share the store: takes, keeps and gives up their leases.
 //
-// Why so        A store that is away from everybody must stop recording nowhere, and a host that alone is cut off
+// Why so        A store that nobody reaches must stop recording nowhere, and a host that alone is cut off
 //               cannot tell the two apart. So a host keeps what it held when it last reached the store. Once its
 //               heartbeat has stood still for long enough, the others take its floating cameras over, and then two
 //               record them, until it reaches the store again and learns within two seconds what it has lost: footage
@@ -30,16 +30,16 @@ namespace lookhaven::recorder {
 
 class HostCameras {
   public:
-    // Starts the thread. away_us as in HostWatch. rows: holds the lease of this host's recorder. All outlive this
+    // Starts the thread. offline_us as in HostWatch. rows: holds the lease of this host's recorder. All outlive this
     // object. Throws std::system_error when no thread can be started.
-    HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t away_us);
+    HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us);
 
     // Call every second: does what is due; does not wait. has_room: there is a mount to record to.
     void Ask(bool has_room);
 
     // The cameras to record, until the next call. One thread.
     std::set<int> Held() const;
-    // Another host has its lease, there or away; also while that is not known yet.
+    // Another host has its lease, online or offline; also while that is not known yet.
     bool IsHeldElsewhere(int camera) const;
     // The cameras still being recorded or written once the last Held() was acted upon.
     void NoteRecorded(std::set<int> cameras);
@@ -60,7 +60,7 @@ class HostCameras {
     const int own_;
     std::atomic<bool> has_room_ = false;
     std::atomic<std::int64_t> no_room_since_us_ = 0;  // 0: it has room, or was not asked yet
-    const std::int64_t away_us_;
+    const std::int64_t offline_us_;
 
     // Only the thread uses these.
     HostWatch watch_;

@@ -31,7 +31,7 @@ class LeaseKeeper {
           times_(times) {}
 
     // Renews or takes the lease when that is due; whether this process has it. first_reserved_id as in RecorderLease.
-    // While the store is away the lease stays. Throws store::StoreError.
+    // While the store is unreachable the lease stays. Throws store::StoreError.
     bool Hold(store::Store& store, int first_reserved_id);
     // Gives the lease back if this process has it: at a clean stop, when all rows are stored. Throws store::StoreError.
     void Release(store::Store& store);

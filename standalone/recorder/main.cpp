@@ -39,11 +39,11 @@ void StopOnSignals() {
 }
 
 void RunUntilStopped(const base::Installation& installation, std::chrono::milliseconds no_data_limit,
-                     std::chrono::milliseconds host_away_limit) {
+                     std::chrono::milliseconds host_offline_limit) {
     const recorder::InstanceLock lock(installation);
     StopOnSignals();
     base::RaiseDescriptorLimit();  // each camera costs several
-    recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit, host_away_limit);
+    recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit, host_offline_limit);
     base::LogInfo("started for " + installation.Home().string());
     base::NotifyReady();
     while (g_stop == 0) {
@@ -71,14 +71,14 @@ int main(int argc, char** argv) {
     CLI::App app("Receives the cameras' streams, records them and passes them to viewers.", "lookhaven-recorder");
     std::string home;
     double no_data_limit_s = 10;
-    double host_away_limit_s = std::chrono::duration<double>(recorder::kHostAwayLimit).count();
+    double host_offline_limit_s = std::chrono::duration<double>(recorder::kHostOfflineLimit).count();
     app.add_option("--home", home, "State folder (default: " + base::DefaultHome().string() + ")");
     app.add_option("--no-data-limit", no_data_limit_s,
                    "Seconds without a picture after which the recorder reconnects to a camera")
         ->check(CLI::Range(0.1, 600.0))
         ->capture_default_str();
     // The same on all hosts of a store. For tests, which have no half a minute.
-    app.add_option("--host-away-limit", host_away_limit_s)->check(CLI::Range(1.0, 600.0))->group("");
+    app.add_option("--host-offline-limit", host_offline_limit_s)->check(CLI::Range(1.0, 600.0))->group("");
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
@@ -87,7 +87,7 @@ int main(int argc, char** argv) {
     try {
         const base::Installation installation =
             home.empty() ? base::Installation::FromEnvironment() : base::Installation(home);
-        RunUntilStopped(installation, Milliseconds(no_data_limit_s), Milliseconds(host_away_limit_s));
+        RunUntilStopped(installation, Milliseconds(no_data_limit_s), Milliseconds(host_offline_limit_s));
         return EX_OK;
     } catch (const std::exception& failure) {
         base::LogError(failure.what());

@@ -15,9 +15,9 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// A heartbeat must be missed several times before its host counts as away.
-LeaseTimes TimesFor(std::chrono::microseconds host_away_limit) {
-    return {host_away_limit.count() / 6, host_away_limit.count() * 2 / 3};
+// A heartbeat must be missed several times before its host counts as offline.
+LeaseTimes TimesFor(std::chrono::microseconds host_offline_limit) {
+    return {host_offline_limit.count() / 6, host_offline_limit.count() * 2 / 3};
 }
 
 // How long after a mark's end another host may still deliver footage of it.
@@ -27,7 +27,7 @@ constexpr std::int64_t kFootageElsewhereS = 900;
 
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit,
-                                         std::chrono::milliseconds host_away_limit)
+                                         std::chrono::milliseconds host_offline_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
@@ -36,10 +36,11 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
           maintenance::WriteMountStatus(installation, states.mounts);
       }),
       rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId(),
-            TimesFor(host_away_limit)),
-      hosts_(installation.HostId() == 0 ? nullptr
-                                        : std::make_unique<HostCameras>(
-                                              installation, rows_, std::chrono::microseconds(host_away_limit).count())),
+            TimesFor(host_offline_limit)),
+      hosts_(installation.HostId() == 0
+                 ? nullptr
+                 : std::make_unique<HostCameras>(installation, rows_,
+                                                 std::chrono::microseconds(host_offline_limit).count())),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(), [this](const store::Mark& mark) {

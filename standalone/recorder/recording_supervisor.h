@@ -22,7 +22,7 @@
 namespace lookhaven::recorder {
 
 // How long a host's heartbeat stands still until others take its cameras over.
-constexpr std::chrono::milliseconds kHostAwayLimit{30'000};
+constexpr std::chrono::milliseconds kHostOfflineLimit{30'000};
 
 // What comes from a camera: from the stream that is recorded, else from one that fails, if any does.
 struct CameraSignal {
@@ -33,9 +33,9 @@ struct CameraSignal {
 
 class RecordingSupervisor {
   public:
-    // host_away_limit: as in Supervisor. The installation must outlive this object. Throws std::system_error.
+    // host_offline_limit: as in Supervisor. The installation must outlive this object. Throws std::system_error.
     RecordingSupervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit,
-                        std::chrono::milliseconds host_away_limit = kHostAwayLimit);
+                        std::chrono::milliseconds host_offline_limit = kHostOfflineLimit);
 
     // Starts, changes and stops workers to match the catalog and the pending marks.
     void Reconcile(const CatalogContents& catalog);

@@ -22,7 +22,7 @@ constexpr std::int64_t kStandstillUs = 3'000'000;
 }  // namespace
 
 Supervisor::Supervisor(const base::Installation& installation, media::SourceKinds kinds,
-                       std::chrono::milliseconds no_data_limit, std::chrono::milliseconds host_away_limit)
+                       std::chrono::milliseconds no_data_limit, std::chrono::milliseconds host_offline_limit)
     : installation_(installation),
       kinds_(std::move(kinds)),
       no_data_limit_(no_data_limit),
@@ -30,7 +30,7 @@ Supervisor::Supervisor(const base::Installation& installation, media::SourceKind
       common_config_(installation),
       counters_(installation),
       catalog_(installation.StoreUrl(), installation.HostId(), [this] { demand_.Wake(); }),
-      recordings_(installation, no_data_limit, host_away_limit) {
+      recordings_(installation, no_data_limit, host_offline_limit) {
     DoEverySecond();
     Reconcile();  // viewers' requests may be older than this recorder
 }

@@ -24,9 +24,9 @@ struct Host {
     std::string version = {};      // of Lookhaven there
     bool draining = false;         // gives the cameras away that others may record, and takes none
     bool has_room = false;         // has a mount to record to; as its recorder says
-    // The count of its recorder's lease (recorder_lease.h): changes while the recorder runs and reaches the store. Away
-    // is a host whose heartbeat has stood still for a while by the watcher's own monotonic clock; this never
-    // compares the clocks of two hosts.
+    // The count of its recorder's lease (recorder_lease.h): changes while the recorder runs and reaches the store. A
+    // host is offline once its heartbeat has not changed for a while of the watcher's own monotonic clock; the clocks of
+    // two hosts are never compared.
     std::int64_t heartbeat = 0;
     std::string recorder = {};  // the name of the recorder that holds the lease; empty while none runs
 
@@ -55,10 +55,10 @@ class Hosts {
     std::optional<Host> FindByName(const std::string& name);
     std::vector<Host> All();  // by id
 
-    // The host that records the camera now, by its lease; 0 while none does. It may be away, or removed.
+    // The host that records the camera now, by its lease; 0 while none does. It may be offline, or removed.
     int HostOfCamera(int camera_id);
     // The host that has the mount; 0 for one that all hosts share, for the only host's, and for an unknown one. It may
-    // be away, or removed.
+    // be offline, or removed.
     int HostOfMount(int mount_id);
 
   private:

@@ -223,7 +223,7 @@ class HostsTest(unittest.TestCase):
             began = time.monotonic()
             answer = self.other.request(query, "viewer")
             self.assertEqual(answer.status, 503, answer.body[:200])
-            self.assertRegex(answer.json["error"]["message"], "camera 1 is on host North, which is away")
+            self.assertRegex(answer.json["error"]["message"], "camera 1 is on host North, which is offline")
             self.assertLess(time.monotonic() - began, 10)
         self.assertEqual(self.other.request(call(PLAYER, "LoadCamera"), "viewer").status, 200)
         self.assertTrue(recorded_events(self.other, 1))

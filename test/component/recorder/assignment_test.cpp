@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which cameras a host takes and gives away, and which hosts it takes for away.
+// Which cameras a host takes and gives away, and which hosts it takes for offline.
 #include "standalone/recorder/assignment.h"
 
 #include <string>
@@ -18,7 +18,7 @@ constexpr AssignedHost kTakes{0, true, true, true};
 constexpr AssignedHost kDrains{0, true, true, false, true};
 constexpr AssignedHost kHasNoRoom{0, true, true, false};
 constexpr AssignedHost kStopped{0, true, false, false};
-constexpr AssignedHost kAway{0, false, false, false};
+constexpr AssignedHost kOffline{0, false, false, false};
 
 // Hosts 1, 2, … in these states.
 std::vector<AssignedHost> Hosts(std::vector<AssignedHost> states) {
@@ -40,7 +40,7 @@ TEST(Assignment, ACameraMovesWhenItMustAndSomebodyTakesIt) {
     const Case cases[] = {
         {"free", {kTakes}, {.host_id = 0}, true},
         {"of an unknown host", {kTakes}, {.host_id = 9}, true},
-        {"of a host that is away", {kTakes, kAway}, {.host_id = 2}, true},
+        {"of a host that is offline", {kTakes, kOffline}, {.host_id = 2}, true},
         {"of a host that was stopped a moment ago", {kTakes, kStopped}, {.host_id = 2}},
         {"of another host", {kTakes, kTakes}, {.host_id = 2}},
         {"free and disabled", {kTakes}, {.enabled = false}},
@@ -53,16 +53,16 @@ TEST(Assignment, ACameraMovesWhenItMustAndSomebodyTakesIt) {
         {"own, and only a stopped host could take it", {kDrains, kStopped}, {.host_id = 1}},
         {"fixed to this host, and free", {kDrains, kTakes}, {.fixed_host_id = 1}, true},
         {"fixed to this host, of one that runs", {kTakes, kTakes}, {.fixed_host_id = 1, .host_id = 2}},
-        {"fixed to this host, of one that is away", {kTakes, kAway}, {.fixed_host_id = 1, .host_id = 2}, true},
-        {"fixed to another, and free", {kTakes, kAway}, {.fixed_host_id = 2}},
-        {"fixed to another, which is away and has it", {kTakes, kAway}, {.fixed_host_id = 2, .host_id = 2}},
+        {"fixed to this host, of one that is offline", {kTakes, kOffline}, {.fixed_host_id = 1, .host_id = 2}, true},
+        {"fixed to another, and free", {kTakes, kOffline}, {.fixed_host_id = 2}},
+        {"fixed to another, which is offline and has it", {kTakes, kOffline}, {.fixed_host_id = 2, .host_id = 2}},
         {"own, fixed to another", {kTakes, kDrains}, {.fixed_host_id = 2, .host_id = 1}, false, true},
-        {"own, fixed to another that is away", {kTakes, kAway}, {.fixed_host_id = 2, .host_id = 1}},
+        {"own, fixed to another that is offline", {kTakes, kOffline}, {.fixed_host_id = 2, .host_id = 1}},
         {"own and fixed, while it drains", {kDrains, kTakes}, {.fixed_host_id = 1, .host_id = 1}},
         {"own, moved to another", {kTakes, kTakes}, {.host_id = 1, .next_host_id = 2}, false, true},
-        {"own, moved to one that is away", {kTakes, kAway}, {.host_id = 1, .next_host_id = 2}},
+        {"own, moved to one that is offline", {kTakes, kOffline}, {.host_id = 1, .next_host_id = 2}},
         {"moved to another, and free", {kTakes, kTakes}, {.next_host_id = 2}},
-        {"moved to one that is away, and free", {kTakes, kAway}, {.next_host_id = 2}, true},
+        {"moved to one that is offline, and free", {kTakes, kOffline}, {.next_host_id = 2}, true},
     };
     for (Case each : cases) {
         SCOPED_TRACE(each.name);
@@ -111,22 +111,22 @@ class HostWatchTest : public testing::Test {
 
 TEST_F(HostWatchTest, AHostIsAwayOnceItsHeartbeatHasStoodStill) {
     Pass(30, 1);
-    EXPECT_TRUE(watch_.IsThere(1) && watch_.IsThere(2)) << "seen for less than half a minute";
+    EXPECT_TRUE(watch_.IsOnline(1) && watch_.IsOnline(2)) << "seen for less than half a minute";
     Pass(1, 1);
-    EXPECT_TRUE(watch_.IsThere(1));
-    EXPECT_FALSE(watch_.IsThere(2) || watch_.IsThere(3));
+    EXPECT_TRUE(watch_.IsOnline(1));
+    EXPECT_FALSE(watch_.IsOnline(2) || watch_.IsOnline(3));
     hosts_[1].heartbeat = -5;
     Pass(1, 1);
-    EXPECT_TRUE(watch_.IsThere(2)) << "a store that lost its last seconds has a lower count";
+    EXPECT_TRUE(watch_.IsOnline(2)) << "a store that lost its last seconds has a lower count";
 }
 
 TEST_F(HostWatchTest, NobodyIsAwayBecauseTheStoreWas) {
     Pass(25, 1);
     now_us_ += 3'600'000'000;
     Pass(30);
-    EXPECT_TRUE(watch_.IsThere(1) && watch_.IsThere(2));
+    EXPECT_TRUE(watch_.IsOnline(1) && watch_.IsOnline(2));
     Pass(1);
-    EXPECT_FALSE(watch_.IsThere(1) || watch_.IsThere(2));
+    EXPECT_FALSE(watch_.IsOnline(1) || watch_.IsOnline(2));
 }
 
 }  // namespace

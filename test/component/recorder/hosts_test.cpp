@@ -27,7 +27,7 @@ namespace {
 namespace fs = std::filesystem;
 
 // Long enough that a busy machine delays no heartbeat for that long.
-constexpr const char* kAwayLimitS = "4";
+constexpr const char* kOfflineLimitS = "4";
 constexpr std::chrono::seconds kLimit{40};
 
 // A state folder of its own with one mount, and the recorder that runs for it.
@@ -59,9 +59,9 @@ class Machine {
 
     fs::path Folder() const { return home_.Path() / "recordings"; }
     void Start() {
-        recorder_.emplace(
-            std::vector<std::string>{RECORDER_PATH, "--home", home_.Path().string(), "--host-away-limit", kAwayLimitS},
-            home_ / "log/recorder");
+        recorder_.emplace(std::vector<std::string>{RECORDER_PATH, "--home", home_.Path().string(),
+                                                   "--host-offline-limit", kOfflineLimitS},
+                          home_ / "log/recorder");
     }
     void Signal(int signal) const { recorder_->Signal(signal); }
     void Stop(int signal) {
@@ -248,7 +248,7 @@ TEST_F(HostsTest, AHostThatStoodStillLetsGoOfWhatOthersTook) {
     ExpectSound();
 }
 
-TEST_F(HostsTest, AStoreThatIsAwayFromEverybodyMovesNothing) {
+TEST_F(HostsTest, AStoreThatNobodyReachesMovesNothing) {
     StartHosts(2);
     const int first = AddCamera();
     const int second = AddCamera();
