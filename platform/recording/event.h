@@ -18,7 +18,7 @@ enum REC_EVENT_TYPE : int {
     REC_EVENT_POS = 2,
 };
 
-// Why a recording was made; the recorder of this host makes the first two.
+// Why a recording was made.
 enum REC_METHOD : int {
     REC_METHOD_CONTINUOUS = 1,
     REC_METHOD_ALARM = 3,

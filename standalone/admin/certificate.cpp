@@ -83,7 +83,7 @@ Json::Value ReplaceCertificate(store::Store& store, const base::Installation& in
                                const CertificateOffer& offer, const Reload& reload) {
     RequireManager(store, actor);
     const remote::CertificatePair pair = Read(offer);
-    // Whose browser goes meanwhile leaves no web server that was not told.
+    // Even if the client hangs up meanwhile, the web server is told to reload.
     const base::BlockedSignals whole;
     CertificateFolder folder(installation);
     const std::string known = CertificateFolder::Certificates(installation);

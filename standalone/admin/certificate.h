@@ -31,7 +31,7 @@ Json::Value CertificateRecord(const remote::CertificateFacts& facts);
 Json::Value CurrentCertificate(const base::Installation& installation);
 
 // What is offered, as CertificateRecord has it, with "pairedHosts": the names of the hosts that were paired by the
-// certificate in use and would take the new one for a stranger's: they must be paired anew. Changes nothing.
+// certificate in use and would take the new one for a stranger's: they must be paired again. Changes nothing.
 Json::Value ExamineCertificate(store::Store& store, const base::Installation& installation, const Actor& actor,
                                const CertificateOffer& offer);
 

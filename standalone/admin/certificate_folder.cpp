@@ -61,7 +61,7 @@ void CertificateFolder::Prepare(const std::string& certificates, const std::stri
     }
     fs::create_directory(used_);
     if (fs::exists(other_)) {
-        // Of a process that died: it may be the last pair that the web server took.
+        // Left by a process that died: it may be the last pair that the web server accepted.
         fs::remove_all(home_ / "tls.before");
         fs::rename(other_, home_ / "tls.before");
     }
@@ -94,7 +94,7 @@ void CertificateFolder::Exchange() const {
         base::ThrowErrno("cannot replace " + used_.string());
     }
     if (::fsync(home.Get()) != 0) {
-        // They have changed places, which whoever calls must not take for undone.
+        // The folders are exchanged all the same, so this must not look like a failure.
         base::LogError("cannot sync " + home_.string() + " after the certificate was replaced");
     }
 }

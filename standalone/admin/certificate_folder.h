@@ -2,9 +2,9 @@
 //
 // The web server's certificate and key on disk, replaced as one.
 //
-// Why so        Two files cannot be renamed in one step, and a certificate beside the key of another one keeps the web
-//               server from starting. So a whole folder is made beside theirs, and the two folders change places.
-// Invariants    (1) Whoever looks, whenever this process or the machine dies: the files of the folder belong together.
+// Why so        Two files cannot be renamed in one step, and a certificate with the key of another one keeps the web
+//               server from starting. So a whole folder is made next to theirs, and the two are exchanged.
+// Invariants    (1) The files of the folder belong together at any moment, also after a crash or a power cut.
 //               (2) What else an owner keeps in the folder stays in it.
 // One at a time: the constructor throws where somebody else replaces them.
 #pragma once

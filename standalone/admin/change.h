@@ -27,7 +27,7 @@ struct Change {
 };
 
 // Makes the change and its row in the audit log in one transaction, which is undone when make throws; no other Apply
-// goes on meanwhile. A change whose before and after are equal leaves no row. Throws Forbidden before make is called,
+// proceeds meanwhile. A change whose before and after are equal leaves no row. Throws Forbidden before make is called,
 // StoreError, and what make throws.
 void Apply(store::Store& store, const Actor& actor, const std::function<Change()>& make);
 

@@ -37,7 +37,7 @@ Json::Value PortsRecord(Devices& devices, int camera) {
     return json;
 }
 
-// Of a camera that is known.
+// The camera must exist.
 std::string CameraName(store::Store& store, int id) {
     const std::optional<store::Camera> camera = store::Cameras(store).Find(id);
     return camera ? camera->name : store::RecordingServers(store).FindCamera(id).value().name;

@@ -30,7 +30,7 @@ struct HostPlace {
 };
 
 // Makes this machine a host of its store, with the certificate of its web server and this program's version; one that
-// is a host already gets these anew. No recorder may run for it. The first host of a store gets the mounts that there
+// is a host already has these updated. No recorder may run for it. The first host of a store gets the mounts that there
 // are. Throws remote::InvalidCertificate.
 store::Host AddHost(store::Store& store, const Actor& actor, const base::Installation& installation,
                     const HostPlace& place);
@@ -46,7 +46,7 @@ std::int64_t FootageOf(store::Store& store, int host);
 // confirmed, while recordings lie on its mounts and there are other hosts.
 store::Host RemoveHost(store::Store& store, const Actor& actor, const std::string& name, bool confirmed);
 
-// Shares the floating cameras out anew: has hosts give the cameras that are too many to those that have too few, all
+// Redistributes the floating cameras: has hosts give the cameras that are too many to those that have too few, all
 // but those that drain or have no mount to record to. Returns how many are to move.
 int BalanceHosts(store::Store& store, const Actor& actor);
 

@@ -40,7 +40,7 @@ Json::Value FindInvitation(store::Store& store, std::string_view secret, const b
     return invitation;
 }
 
-// Whoever asked for the code makes the pairing, from where it was typed.
+// The account that asked for the code makes the pairing, from the address where it was typed.
 Actor ActorOf(store::Store& store, const Json::Value& invitation, const std::string& address) {
     Actor actor;
     actor.user_id = invitation["user"].asInt();
@@ -90,7 +90,7 @@ void RequireInvitation(store::Store& store, const base::BootTime& now) {
 
 std::string AcceptInvitation(store::Store& store, std::string_view secret, const std::string& address,
                              const base::BootTime& now) {
-    FindInvitation(store, secret, now);  // whoever guesses locks nothing
+    FindInvitation(store, secret, now);  // guessing locks nothing
     std::string shared;
     try {
         store::InTransaction(store, [&] {

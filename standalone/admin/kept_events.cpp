@@ -14,7 +14,7 @@ namespace lookhaven::admin {
 
 namespace {
 
-// Null for what is not kept. Without the time: what is kept anew by the same keeper with the same note is as it was.
+// Null for what is not kept. Without the time, so that keeping again with the same keeper and note is no change.
 Json::Value AuditedKeepRecord(store::Store& store, int id) {
     const auto event = store::Events(store).Find(id);
     if (!event || !event->kept) {

@@ -38,7 +38,7 @@ CannotPair Failed(Reason why) {
     throw std::logic_error("an unknown reason");
 }
 
-// Of the host that has the code, and of nobody else.
+// The certificates of the host that showed the code, and of nobody else.
 std::string FetchRightCertificates(const std::string& address, int port, const remote::PairingCode& code) {
     std::string certificates;
     try {

@@ -38,7 +38,7 @@ struct PairingOutcome {
     std::size_t cameras = 0;
 };
 
-// The record store of whoever calls, which is closed while the other host is waited for.
+// The caller's record store, which is closed while the other host is waited for.
 struct Records {
     std::function<store::Store&()> open;
     std::function<void()> close = [] {};

@@ -52,7 +52,7 @@ bool AreAllKnown(store::Store& store, int id, const std::vector<store::RemoteCam
     });
 }
 
-// A secret is told of, not told.
+// The audit log says that there is a new secret, not which.
 Change Paired(const char* action, const RecordingServer& server, const Json::Value& before) {
     Change change{action, Named(server.name, server.id), before, Audited(server)};
     change.after["secret"] = "new";

@@ -18,7 +18,7 @@
 
 namespace lookhaven::admin {
 
-// Of the setting without which this host shows no cameras of others.
+// The name of the setting without which this host shows no cameras of others.
 inline constexpr const char* kCentralManagement = "cms";
 
 struct Setting {

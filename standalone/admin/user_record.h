@@ -20,7 +20,7 @@ store::Privilege PrivilegeFrom(const std::string& name);
 // {"live": [1, 2], "playback": [], "audio": [], "export": [], "group": {"live": [], …}, "emap": [], "door": [],
 // "ioModule": []}
 Json::Value ToJson(const store::Denials& denials);
-// Of such an object; what is missing denies nothing. Throws store::InvalidRecord for anything else.
+// The denials in such an object; what is missing denies nothing. Throws store::InvalidRecord for anything else.
 store::Denials DenialsFrom(const Json::Value& json);
 
 }  // namespace lookhaven::admin

@@ -42,8 +42,8 @@ void RequireAnotherOwner(Users& users, const User& user) {
     }
 }
 
-// Of what is denied now and was not: a typing error would deny nothing, and nobody would notice. A camera that was
-// removed may stay denied, since its recordings do.
+// Each newly denied camera must exist: a typing error would deny nothing, and nobody would notice. A removed camera
+// may stay denied, since its recordings stay.
 void RequireCameras(store::Store& store, const store::Denials& before, const store::Denials& after) {
     for (const auto& [kind, ids] : after.cameras) {
         const auto known = before.cameras.find(kind);
@@ -69,7 +69,7 @@ void RequireFewItems(const store::Denials& before, const store::Denials& after) 
 
 void SetMayMark(Users& users, const User& user, bool may_mark, bool is_new_privilege) {
     if (user.IsManager()) {
-        // Who makes somebody a manager has said that.
+        // Making an account a manager implies the right.
         if (!may_mark && !is_new_privilege) {
             throw store::InvalidRecord(user.name + " is " +
                                        (user.privilege == Privilege::kOwner ? "owner" : "manager") +
@@ -108,7 +108,7 @@ Json::Value Make(store::Store& store, const User& before, const UserChange& chan
     return UserRecord(store, RequireUser(users, before.id));
 }
 
-// A password is told of, not told.
+// The audit log says that there is a new password, not which.
 Json::Value Audited(Json::Value record, const UserChange& change) {
     if (change.password) {
         record["password"] = "new";

@@ -49,7 +49,7 @@ std::vector<store::Session> SessionsOf(store::Store& store, const Actor& actor, 
 int EndSessions(store::Store& store, const Actor& actor, int id, const std::optional<std::string>& handle,
                 std::string_view kept);
 
-// Of whoever knows the old password, which was just checked; any account may. Ends its other sessions.
+// Changes the caller's own password, after the old one was checked; any account may. Ends its other sessions.
 void ChangePassword(store::Store& store, const std::string& address, const store::VerifiedUser& user,
                     const store::HashedPassword& password, std::string_view kept_session);
 

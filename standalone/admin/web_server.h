@@ -10,14 +10,14 @@
 
 namespace lookhaven::admin {
 
-// The web server goes on as it was.
+// The web server continues with the certificate that it had.
 class WebServerRefused : public std::runtime_error {
   public:
     using std::runtime_error::runtime_error;
 };
 
-// Lets the web server read its certificate anew, and waits until it shows the one of that fingerprint; its connections
-// go on. False where none runs: one that is started later reads it then. Throws WebServerRefused when another one
+// Has the web server reload its certificate, and waits until it shows the one of that fingerprint; its connections
+// stay. False where none runs: one that is started later reads it then. Throws WebServerRefused when another one
 // is still shown after ten seconds, or that cannot be seen.
 bool ReloadWebServer(const base::Installation& installation, const std::string& fingerprint);
 

@@ -22,7 +22,7 @@ namespace lookhaven::api {
 
 using http::Failure;
 
-// Of a camera that does not exist and of one that is denied to the caller, who must not be able to tell which.
+// The same for a camera that does not exist and for a denied one: the caller must not be able to tell which.
 constexpr const char* kNoSuchCamera = "there is no such camera";
 
 // Borrows all that it refers to; lives as long as its request process.

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a manager is shown of a camera beside what is stored: how it is, and how much it has recorded.
+// What a manager is shown of a camera besides its record: its state, and how much it has recorded.
 #pragma once
 
 #include <map>

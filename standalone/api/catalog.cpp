@@ -101,7 +101,7 @@ Json::Value NoSignal(const maintenance::RecordingStatus& status, bool is_manager
     return json;
 }
 
-// Of the cameras that the caller may watch, those that are recorded or watched now.
+// The states of those cameras that the caller may watch and that are recorded or watched now.
 std::string CameraStates(const Call& call) {
     const bool is_manager = binding::IsManager();
     const base::Installation& installation = call.context.Installation();
@@ -124,7 +124,7 @@ std::string CameraStates(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// Of the cameras that the caller may watch or play back, those of paired hosts too.
+// The caller's rights at the cameras that they may watch or play back, those of paired hosts included.
 std::string Rights(const Call& call) {
     using store::CameraAccess;
     std::map<CameraAccess, std::set<int>> denied;

@@ -43,9 +43,9 @@ void MayWriteBelow(const base::FileDescriptor& rules, const std::filesystem::pat
     }
 }
 
-// Whatever the rules say of files, a process under Landlock reaches no process outside: neither its memory nor its
-// descriptors, not even as root. A kernel without it leaves that to Yama. It writes what a player has to: the store,
-// its progress and its player file; so it makes no process of ours one that is killed first.
+// Whatever its rules for files, a process under Landlock can access neither memory nor descriptors of processes
+// outside, not even as root. Without Landlock in the kernel, Yama restricts that. The rules let it write what a player
+// must: the store, its progress and its player file; not /proc, where it could have another process killed first.
 void ShieldOtherProcesses(const base::Installation& installation) {
     landlock_ruleset_attr attributes{};
     attributes.handled_access_fs = LANDLOCK_ACCESS_FS_EXECUTE | kWriting | LANDLOCK_ACCESS_FS_MAKE_SYM |
@@ -75,8 +75,7 @@ void ShieldOtherProcesses(const base::Installation& installation) {
 
 }  // namespace
 
-// Each call costs an instruction, and each instruction time at the start of a player. What only root may do is not
-// named.
+// Calls that only root may make are not listed: each costs an instruction, which takes time when a player starts.
 std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     SystemCallFilter filter(SystemCallFilter::DefaultAction::kAllow);
     // Programs and processes. Threads are made by clone, since a filter cannot read what clone3 is told.
@@ -85,7 +84,7 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     filter.AddException({SCMP_SYS(ptrace), SCMP_SYS(process_vm_readv), SCMP_SYS(process_vm_writev),
                          SCMP_SYS(pidfd_open), SCMP_SYS(pidfd_getfd), SCMP_SYS(pidfd_send_signal), SCMP_SYS(kill),
                          SCMP_SYS(tkill), SCMP_SYS(rt_sigqueueinfo), SCMP_SYS(rt_tgsigqueueinfo)});
-    filter.AddException({SCMP_SYS(tgkill)}, {ArgumentIsNot(0, base::kOwnProcess)});  // itself where its client is gone
+    filter.AddException({SCMP_SYS(tgkill)}, {ArgumentIsNot(0, base::kOwnProcess)});  // when its client is gone
     filter.AddException({SCMP_SYS(prlimit64)}, {ArgumentIsNot(0, 0)});
     filter.AddException({SCMP_SYS(setpriority), SCMP_SYS(ioprio_set), SCMP_SYS(sched_setaffinity),
                          SCMP_SYS(sched_setattr), SCMP_SYS(sched_setparam), SCMP_SYS(sched_setscheduler)});
@@ -96,7 +95,7 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
     for (const int command : {FIOSETOWN, SIOCSPGRP, TIOCSTI, TIOCLINUX}) {
         filter.AddException({SCMP_SYS(ioctl)}, {{1, command}});
     }
-    // What Landlock of many kernels does not know: emptying files, and changing whose they are.
+    // Not covered by Landlock in many kernels: truncating files, and changing their owner or mode.
     filter.AddException({SCMP_SYS(truncate), SCMP_SYS(truncate64), SCMP_SYS(creat), SCMP_SYS(openat2), SCMP_SYS(chmod),
                          SCMP_SYS(fchmodat), SCMP_SYS(chown), SCMP_SYS(chown32), SCMP_SYS(lchown), SCMP_SYS(lchown32),
                          SCMP_SYS(fchownat), SCMP_SYS(setxattr), SCMP_SYS(lsetxattr)});
@@ -109,8 +108,8 @@ std::vector<sock_filter> PlaybackFilter(const std::string& store_url) {
                          SCMP_SYS(userfaultfd), SCMP_SYS(io_uring_setup), SCMP_SYS(io_uring_enter),
                          SCMP_SYS(io_uring_register), SCMP_SYS(keyctl), SCMP_SYS(add_key), SCMP_SYS(request_key),
                          SCMP_SYS(personality), SCMP_SYS(modify_ldt), SCMP_SYS(vmsplice)});
-    // It serves nobody, and speaks to a database's server alone, where there is one: AF_UNIX, AF_INET, AF_INET6; TCP,
-    // or UDP to a name server.
+    // No listening, and no connections but to a database server: AF_UNIX, AF_INET, AF_INET6; TCP, or UDP to a name
+    // server.
     filter.AddException({SCMP_SYS(bind), SCMP_SYS(listen), SCMP_SYS(accept), SCMP_SYS(accept4)});
     for (const int family : {0, 3, 4, 5, 6, 7, 8, 9, 11, 12, 13, 14, 15}) {
         filter.AddException({SCMP_SYS(socket)}, {{0, family}});

@@ -18,7 +18,7 @@ namespace {
 
 constexpr std::size_t kMaxConcurrent = 3;
 
-// What is told of each map beside its record.
+// What an answer has of each map besides its record.
 struct Use {
     explicit Use(store::Store& records) : maps(store::Emaps(records).List()), links(store::Emaps(records).Links()) {}
 

@@ -23,7 +23,7 @@ Json::Value Describe(const store::Event& event);
 // recordings of its footage are.
 Json::Value DescribeWithKeeping(store::Store& records, const store::Mark& mark);
 Json::Value DescribeWithKeeping(store::Store& records, const store::Event& event);
-// Of several, with one question to the store.
+// The same for several, with one query.
 Json::Value DescribeWithKeeping(store::Store& records, const std::vector<store::Event>& events);
 
 // Whether the caller may know of it.

@@ -30,10 +30,10 @@ struct Footage {
 // The call's parameter "kind". Throws Failure 400 for what is neither "alert" nor "pos"; nothing when it is missing.
 std::optional<store::MarkKind> KindOf(const Call& call);
 
-// Wherever it lies, and whoever may see it; nothing when there is no such event, or no footage of it.
+// On whatever host, and without checking rights; nothing when there is no such event, or no footage of it.
 std::optional<Footage> FindFootage(store::Store& records, std::optional<store::MarkKind> kind, int id);
-// Of the call's event, or else what its camera recorded last at or before time_ms. Throws Failure 400 where neither is
-// given, 404 where the camera is unknown to the caller or has nothing recorded.
+// That of the call's event, or else what its camera recorded last at or before time_ms. Throws Failure 400 where
+// neither is given, 404 where the camera is unknown to the caller or has nothing recorded.
 std::optional<Footage> FindRequestedFootage(const Call& call);
 
 // The call's event and kind. Throws Failure 404 when there is no such event, it has no footage, or the caller lacks

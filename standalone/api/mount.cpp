@@ -194,7 +194,7 @@ auto Completer(const Call& call) {
     };
 }
 
-// Of a number above 0, in units; null is no limit, and one that is missing stays.
+// The limit in a parameter: a number above 0, in units. Null is no limit; a missing parameter changes nothing.
 std::optional<std::int64_t> LimitOf(const Call& call, const std::string& name, double max, double unit) {
     if (!call.parameters.contains(name)) {
         return std::nullopt;

@@ -16,7 +16,7 @@ Json::Value& AppendNamed(Json::Value& list, const Record& record) {
     return json;
 }
 
-// add(json, record) adds what else is told of each.
+// add(json, record) adds the other members of each.
 template <typename Records, typename Add>
 Json::Value NamedList(const Records& records, Add add) {
     Json::Value list = Json::arrayValue;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The APIs of the standalone platform, beside those of the loaded modules: a table each, in a file each.
+// The APIs of the standalone platform, besides those of the loaded modules: one table in one file for each.
 //
 // A new API has a row in FindOwnApi, a page in docs/api, and, where it takes a POST, a place in the web server's list
 // of APIs that are no log-in (packaging/nginx).

@@ -49,7 +49,7 @@ std::string TryCode(const Call& call, const std::string& address) {
     try {
         return admin::AcceptInvitation(call.Records(), code, address, now);
     } catch (const admin::InvalidInvitation&) {
-        // Wrong ones alone: whoever shares the other host's network must not keep the right one out.
+        // Only a wrong code counts: others in the other host's network must not block the right one.
         CountAttempt(call, kCode);
         throw;
     }

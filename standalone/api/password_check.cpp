@@ -14,7 +14,7 @@ namespace lookhaven::api {
 
 namespace {
 
-// Whoever is logged in can ask for hashes without end, with the right password, and must keep nobody from logging in.
+// A logged-in user who gives the right password can request any number of hashes, and must not block log-ins.
 constexpr control::HashingLimits kHashingLimits{.in_all = 4, .of_users = 2, .of_user = 1};
 
 // Whom a limit counts as one: an IPv4 address, or the /64 network of an IPv6 address, all of which one client may use.
@@ -85,7 +85,7 @@ void CheckSetupToken(const Call& call, const std::string& token) {
     try {
         admin::RequireSetupToken(call.Records(), token, base::TimeSinceBoot());
     } catch (const admin::InvalidToken&) {
-        // After the look at the token: whoever shares the owner's network must not keep the right one out.
+        // Only a wrong token counts: others in the owner's network must not block the right one.
         CountAttempt(call, "setup token");
         throw;
     }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Passwords that a caller gives: each costs 64 MiB and a tenth of a second, and a wrong one slows down the next.
+// Checks passwords that a caller gives: each costs 64 MiB and a tenth of a second, and wrong ones are throttled.
 #pragma once
 
 #include <initializer_list>
@@ -11,7 +11,7 @@
 
 namespace lookhaven::api {
 
-// Whoever checks or hashes a password on request holds this meanwhile; one at a time in a process.
+// Held while a password is checked or hashed for a request; one at a time in a process.
 class HashingPermit {
   public:
     // Throws Failure 503 when there is none.
@@ -24,8 +24,8 @@ class HashingPermit {
     control::Slot& slot_;
 };
 
-// The account of that name and password. Throws Failure 401 for a wrong one; 429 and 503 for who may not try now: an
-// attempt for which there is no room does not count as one, and one that is barred takes no room.
+// The account of that name and password. Throws Failure 401 for a wrong one; 429 after too many attempts, without
+// taking a hashing permit; 503 where there is no permit, which does not count as an attempt.
 store::VerifiedUser CheckPassword(const Call& call, const std::string& account, const std::string& password);
 
 // The caller, who gives their password again in the parameter of that name. A wrong one counts and is logged as that
@@ -38,7 +38,7 @@ void CheckSetupToken(const Call& call, const std::string& token);
 
 // Counts an attempt with a secret that is no password by the caller's network, as a log-in is counted by account and
 // network. secret: what it is, "setup token"; no account has a name with a space. Throws Failure 429 from the sixth
-// within a minute on. Call it for wrong ones, after the look.
+// within a minute on. Call it for wrong secrets, after checking them.
 void CountAttempt(const Call& call, const char* secret);
 
 // The new password of the parameter of that name, not hashed yet. To be asked before anything is hashed. Throws

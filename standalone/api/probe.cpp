@@ -19,7 +19,7 @@ namespace {
 
 constexpr std::size_t kMaxProbes = 3;
 constexpr int kPictureWidth = 640;
-// Of each step: to connect, to the first picture, to the next. Well within the host's limit of a request.
+// For each step: to connect, to the first picture, to the next. Well within the host's limit of a request.
 constexpr std::chrono::seconds kMaxWait{6};
 
 media::ProbeResult ProbeIsolated(const std::string& source, media::SourceOptions options) {

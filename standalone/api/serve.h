@@ -25,18 +25,18 @@ struct Service {
     const http::RequestCounters& counters;
 };
 
-// Loads and binds what every request process would have to. Call it before they are forked. What fails, each of them
-// reports.
+// Loads and binds what every request process would otherwise load and bind itself. Call it before any is forked. A
+// failure is reported by each of them.
 void PrepareToServe(const base::Installation& installation);
-// Likewise in a process that waits for its request: opens the store, and touches the memory that most requests need.
+// The same in a process that waits for its request: opens the store, and touches the memory that most requests need.
 void PrepareProcess(const base::Installation& installation);
 
-// Whether the request may ask for the service's counters, of which each process has those of when it was forked. Not
-// exact: who disguises the name sees old ones.
+// Whether the request may ask for the service's counters. A process has them as of when it was forked, so such a
+// request needs a new one. Not exact: a client that disguises the method's name gets outdated counters.
 bool NeedsCounters(const http::Request& request);
 
-// Whether the request may be one of log-in, setting up or log-out. Not exact, and need not be: the web server lets
-// through few POSTs that name this api.
+// Whether the request may be a log-in, the first set-up or a log-out. It need not be exact: the web server limits the
+// rate of POSTs that name this API.
 bool MayBeLogIn(const http::Request& request);
 
 // For a request without a session whose body holds more than kMaxBodyWithoutSession.

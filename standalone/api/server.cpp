@@ -95,7 +95,7 @@ std::string Check(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// Of the web server.
+// The web server's certificate.
 remote::CertificateFacts OwnCertificate(const Call& call) {
     try {
         return remote::LoadAndReadCertificate(

@@ -2,7 +2,7 @@
 //
 // Tells forged session cookies from real ones before a request has a process, at the cost of a hash.
 //
-// Why so        Whoever forges a cookie would otherwise make the host fork, open the store and read a body of
+// Why so        A forged cookie would otherwise make the host fork, open the store and read a body of
 //               megabytes. The host itself cannot open the store, so a child that can hands it the key.
 #pragma once
 

@@ -176,7 +176,7 @@ bool Await(const Call& call, Clock::time_point due) {
     return !MustEnd(call);
 }
 
-// False when the stream must end early. Throws Failure 406 where it goes on in another codec.
+// False when the stream must end early. Throws Failure 406 where it continues in another codec.
 bool SendAll(const Call& call, archive::RecordingReader& recording, media::RecordedMedia& media, const Pace& pace,
              Parts& parts) {
     const std::string codec = media.VideoCodec();

@@ -34,7 +34,7 @@ constexpr int kMaxBacklog = 1'000;
 constexpr int kMarksPage = 20;  // of up to 8 KiB of text each
 constexpr int kReportsPage = 1'000;
 
-// Where a client stands: the last mark that it was told of, 0 for none, and when.
+// Where a client stands: the last mark that it received, 0 for none, and when.
 struct Place {
     int mark = 0;
     std::int64_t told_s = 0;
@@ -94,8 +94,8 @@ std::string EventText(const char* name, const Place& place, const Json::Value& d
     return std::string("event: ") + name + "\nid: " + place.Text() + "\ndata: " + base::OneLineJson(data) + "\n\n";
 }
 
-// Whether the caller can have been told of that mark: one that it may see, or one before such a one. A mark of nobody's
-// knowledge is of a store that was restored since; and of what is hidden the answer tells nothing.
+// Whether the caller can have received that mark: it may see it, or a later one. An id beyond comes from before the
+// store was restored from a backup. The result must not reveal whether a hidden mark exists.
 bool MayHaveSeen(store::Marks& marks, int id, int newest_visible) {
     if (id <= newest_visible) {
         return true;

@@ -75,7 +75,7 @@ void SortByStart(std::list<Event>& events) {
     }
 }
 
-// Of several hosts each has the recording logs of its own mounts alone. What the rows tell is the same at all of them.
+// Each host has only the recording logs of its own mounts. What the rows tell is the same on all hosts.
 int ReadRows(const std::string& camera, std::int64_t from_s, std::span<std::uint8_t> seconds) {
     const std::int64_t to_s = from_s + static_cast<std::int64_t>(seconds.size());
     std::ranges::fill(seconds, std::uint8_t{0});

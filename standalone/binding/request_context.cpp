@@ -48,7 +48,7 @@ RequestContext& RequestContext::Current() {
 void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
     const std::optional<StoreFile> file = FileOf(installation.StoreUrl());
     auto records = std::make_unique<store::Store>(store::Store::Open(installation.StoreUrl()));
-    // Of nobody: what is read stays in this process's memory.
+    // Records that do not exist: reading them warms up this process's memory.
     store::Users(*records).Find(0);
     store::Cameras(*records).Find(0);
     // A connection to a server may be gone when it is needed.

@@ -88,9 +88,9 @@ class LH_PLATFORM_API RequestContext {
     RequestContext(const RequestContext&) = delete;
     RequestContext& operator=(const RequestContext&) = delete;
 
-    // In a process that waits for its request: opens the store if that is a file, and goes once the way through it that
-    // requests go. Begin closes it when the installation has another store, or the store another schema, by then.
-    // Throws store::StoreError.
+    // In a process that waits for its request: opens the store if that is a file, and reads it once as requests do, so
+    // that their first read is fast. Begin closes it when the installation has another store, or the store another
+    // schema, by then. Throws store::StoreError.
     void OpenRecordsAhead(const base::Installation& installation);
 
     // Borrows output for the rest of the process's life, null where nothing is sent.
@@ -113,8 +113,8 @@ class LH_PLATFORM_API RequestContext {
     int HostOf(int camera_id);
     // The mount that the camera is recorded to: its plan's, or the default one. Null when there is none.
     const store::Mount* MountOf(int camera_id);
-    // Closes the store, which the next Records opens anew: a stream that runs for weeks must not hold it open. Whoever
-    // is about to send or to wait calls this; references from Records are invalid afterwards.
+    // Closes the store, which the next Records reopens: a stream that runs for weeks must not hold it open. Call it
+    // before sending or waiting; references from Records are invalid afterwards.
     void CloseRecords();
 
     // The caller: a user's id, PAIR_AUTH_UID for a paired host, 0 for nobody.

@@ -119,8 +119,8 @@ void SendQueue::Measure(const Tcp& tcp, std::int64_t now_us) {
     measured_bytes_ = tcp.taken_bytes;
 }
 
-// Of a viewer who keeps up the kernel is asked a few times a second: that costs as much as a tenth of sending a
-// picture.
+// While the viewer keeps up, the kernel is asked only a few times a second: asking costs a tenth of what sending a
+// picture does.
 bool SendQueue::IsDrainedNow(std::int64_t now_us) {
     std::int64_t waiting_bytes = WaitingBytes();
     if (drained_in_a_row_ >= kKeepsUp && now_us - asked_us_ < kIntervalUs) {

@@ -63,7 +63,7 @@ class Zip {
     }
 
   private:
-    // A warning, as of a name that the locale cannot show, is none of ours.
+    // Warnings are ignored, such as that the locale cannot represent a name.
     void Require(int result) const {
         if (result < ARCHIVE_WARN) {
             throw Failure(kDataError, file_,

@@ -55,8 +55,8 @@ class MappedTable {
         return MappedTable(base::SharedMapping(file, sizeof(T), kReadOnly));
     }
 
-    // Puts a new file in place of the one there may be, in one step, once fill(T&) has run. Who has the old one mapped
-    // keeps it. One process at a time. Throws std::system_error.
+    // Puts a new file in place of the one there may be, in one step, once fill(T&) has run. A process that has the old
+    // one mapped keeps that. One process at a time. Throws std::system_error.
     template <typename Fill>
     static MappedTable Replace(const std::filesystem::path& path, Fill fill) {
         std::filesystem::path unfinished = path;

@@ -224,7 +224,7 @@ std::set<std::uint64_t> SlotTable::Pairings() const {
     return pairings;
 }
 
-// The serial is read before the rest: of a slot that is taken anew in between, the old one is marked.
+// The serial is read before the rest: where a slot is reused in between, only its former request is marked.
 void SlotTable::EndAll(const std::function<bool(const Slot&)>& is_meant) {
     for (Slot& slot : Used()) {
         const RequestRef use{&slot, slot.serial};

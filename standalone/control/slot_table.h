@@ -85,7 +85,7 @@ struct alignas(kSlotBytes) Slot {
     std::atomic<int> user;               // whose request was admitted; 0: none yet
     std::atomic<std::uint64_t> pairing;  // with the host that sent the request, or that it asks; 0: none
     std::atomic<Work> work;
-    std::atomic<bool> is_hashing;  // a password, beside its work
+    std::atomic<bool> is_hashing;  // a password, besides its work
     std::array<char, 64> session;
     std::atomic<bool> has_call;
     std::array<char, 64> call;
@@ -125,7 +125,7 @@ class SlotTable {
 
     // For a request process: what it serves, "VEXO.Event/List", for those who count; only the first 63 bytes are kept.
     static void SetCall(Slot& slot, std::string_view call);
-    // Of the slots of running requests. They may end, or change, at any time.
+    // Visits the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
     // For a request process, six ways to occupy something, each in one step among all processes: however many try at
@@ -140,7 +140,7 @@ class SlotTable {
     static void EndHashing(Slot& slot) { slot.is_hashing = false; }
     // Until the process ends. False: no room.
     bool BeginProbing(Slot& slot, std::size_t max_in_all);
-    // Of its user's exports, until the process ends. kGranted, or for lack of room nothing is changed.
+    // One of its user's exports, until the process ends. Unless it is kGranted, nothing is changed.
     QuotaResult BeginExport(Slot& slot, std::size_t max_of_user, std::size_t max_in_all);
     // One of its user's watches, and no search any more, until the process ends. False: no room.
     bool BeginWatch(Slot& slot, std::size_t max_of_user);

@@ -2,7 +2,7 @@
 //
 // What the recorder counts of each stream that it runs, for those who watch over the installation.
 //
-// Why so        Numbers that change with every frame do not belong in a file that is written anew, nor in the store. So
+// Why so        Numbers that change with every frame do not belong in a file that is replaced, nor in the store. So
 //               they lie in a mapped file, to which the recorder copies its counts every second.
 // Invariants    (1) A row's numbers may be of two different seconds; each by itself is whole.
 //               (2) Counts begin at 0 with each start of a stream.
@@ -28,7 +28,7 @@ struct StreamCounters {
     std::uint64_t connections = 0;     // attempts to reach the camera
     std::int64_t last_picture_us = 0;  // when the stream was started, before there is one
 
-    // Of its recording, if it is recorded.
+    // These concern its recording, if it is recorded.
     bool is_recorded = false;
     std::uint64_t dropped_pictures = 0;  // because the disk was too slow
     std::uint64_t queued_bytes = 0;      // waiting for the disk

@@ -4,7 +4,7 @@
 //
 // Why so        A picture is untrusted input, and every viewer's browser decodes it. So a process of its own,
 //               which can do nothing else, decodes it first, and what that process makes of the pixels is stored: no
-//               other byte of the file goes on.
+//               other byte of the file is passed on.
 #pragma once
 
 #include <cstddef>
@@ -15,7 +15,7 @@
 
 namespace lookhaven::emap {
 
-// Of a file that is re-encoded; what comes of it has kMaxPictureBytes at most (pictures.h).
+// The largest file that is re-encoded; the result has kMaxPictureBytes at most (pictures.h).
 constexpr std::size_t kMaxUploadBytes = 20U << 20U;
 
 class MapPicture {

@@ -21,7 +21,7 @@ class SpaceWatch {
     static constexpr std::int64_t kMinPauseUs = 60'000'000;
     static constexpr std::int64_t kMaxPauseUs = 3'600'000'000;
 
-    // is_held: as a watch told before this one.
+    // is_held: what IsHeld() of the previous watch returned.
     explicit SpaceWatch(bool is_held = false) : is_held_(is_held) {}
 
     // How much of what is lacking may be deleted now; 0 or less is lacking when the disk has room. After a pause one

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Writes a Matroska file, or a stream of Matroska or MP4 to whoever takes its bytes.
+// Writes a Matroska file, or a stream of Matroska or MP4 to a sink for its bytes.
 #pragma once
 
 #include <memory>

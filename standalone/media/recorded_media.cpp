@@ -94,7 +94,7 @@ std::optional<RecordedPacket> RecordedMedia::Next() {
     }
 }
 
-// Of what lies before the frame to come.
+// The sound that lies before the next frame.
 std::optional<RecordedPacket> RecordedMedia::TakeSound() {
     const std::span<const archive::FrameEntry> entries = recording_.Entries(segment_);
     if (previous_ && next_ < entries.size()) {

@@ -3,8 +3,8 @@
 // Reads a recording, or a span of several, as it was recorded: compressed video and sound in file order, from the key
 // frame on with which decoding of a frame begins.
 //
-// Why so        Video goes by the index, so it has the numbers and times that players of pictures have, and goes on
-//               after damage. What is found of sound is what lies between the frames.
+// Why so        Video is read by the index, so it has the same numbers and times as in players of pictures, and
+//               continues after damage. Sound is found by scanning what lies between the frames.
 // Invariants    (1) The first video frame, and the first after damage, is a key frame.
 //               (2) A frame comes once it is known whether it is shown, and under which number.
 #pragma once
@@ -29,8 +29,8 @@ struct RecordedPacket {
     std::span<const std::uint8_t> data;
     std::int64_t time_ms = 0;      // from the start of the recording or span; negative before a span
     std::int64_t captured_ms = 0;  // wall clock
-    // Of a video frame, as RecordingReader counts: of one that is repeated the first, or the one it was begun with;
-    // nothing for one outside of a span that others are made from.
+    // The video frame's number, as RecordingReader counts: of a repeated frame the first, or the one that reading began
+    // with. Nothing for a frame outside the span that is only needed for decoding others.
     std::optional<int> number;
 };
 
@@ -44,7 +44,7 @@ class RecordedMedia {
     // longer be read.
     std::optional<RecordedPacket> Next();
 
-    // Of the packet that was returned last, before the first of the one to come: names as base::CodecName gives them.
+    // The codec of the packet returned last, before the first call that of the first packet: as base::CodecName has it.
     const std::string& VideoCodec() const { return recording_.Header(segment_).codec; }
     // Empty without sound, or where its codec is unknown.
     const std::string& AudioCodec() const { return audio_codec_; }
@@ -67,7 +67,7 @@ class RecordedMedia {
     bool with_sound_;
     int from_;
     int placed_ = 0;  // frames of the recording that have a place in numbers_, or belong to segments before
-    // Of the segment:
+    // These are of the current segment:
     std::uint32_t segment_ = 0;
     archive::MatroskaTracks tracks_;
     std::string audio_codec_;

@@ -69,7 +69,7 @@ class RecordingWriter {
     // allowed after it succeeded.
     void Close();
 
-    // Of what was flushed.
+    // The frames that were flushed.
     int FrameCount() const { return frame_count_; }
     std::uint64_t SizeBytes() const { return end_bytes_ + index_->SizeBytes(); }  // of the recording and its index
     // When the last frame leaves the screen; the start while there is none.

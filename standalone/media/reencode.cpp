@@ -63,7 +63,7 @@ int Number(std::span<const std::uint8_t> file, std::size_t at, std::size_t bytes
     return static_cast<int>(std::min(number, std::uint32_t{0x7fffffff}));
 }
 
-// As the file's head says; libav reads it anew. 0 where there is none.
+// As the file's header says, which libav parses again. 0 where there is none.
 PictureSize SizeInHead(std::string_view type, std::span<const std::uint8_t> file) {
     if (type == "png") {
         constexpr std::size_t kHead = 12;

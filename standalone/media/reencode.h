@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Re-encodes an untrusted picture: what was in its file beside the pixels is gone.
+// Re-encodes an untrusted picture: whatever its file held besides the pixels is gone.
 #pragma once
 
 #include <cstddef>

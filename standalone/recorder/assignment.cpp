@@ -8,7 +8,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// A gap between two looks at the store longer than offline_us / kMaxGapPart starts every host's timer anew.
+// A gap between two looks at the store longer than offline_us / kMaxGapPart restarts every host's timer.
 constexpr std::int64_t kMaxGapPart = 3;
 
 class Sharing {

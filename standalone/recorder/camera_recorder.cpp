@@ -149,7 +149,7 @@ int CameraRecorder::Reason() const {
     return request_.plan.mode == store::RecordMode::kAlways ? base::kReasonContinuous : base::kReasonAlarm;
 }
 
-// Of more than a few seconds, and not of a camera that always sends so few pictures.
+// A gap of more than a few seconds, unless the camera always sends so few pictures.
 bool CameraRecorder::IsAfterGap(const Frame& frame) const {
     return frame.medium == base::Medium::kVideo &&
            frame.timestamp_us - newest_us_ > std::max(kMaxGapUs, 3 * interval_us_);
@@ -193,7 +193,7 @@ bool CameraRecorder::MayCutByTimes() {
     return true;
 }
 
-// As long as the store has assigned no id for the next event, this one goes on.
+// As long as the store has assigned no id for the next event, this one continues.
 bool CameraRecorder::IsOverdue(std::int64_t length_us) const {
     return length_us >= std::int64_t{request_.plan.segment_s} * 1'000'000 && context_.rows.HasId();
 }

@@ -12,7 +12,7 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// With segments of five minutes, recording goes on for twenty minutes without the store.
+// With segments of five minutes, recording continues for twenty minutes without the store.
 constexpr std::size_t kIdsPerCamera = 4;
 // From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
 // second.

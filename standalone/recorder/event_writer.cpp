@@ -29,7 +29,7 @@ store::Event RowOf(const EventStart& start, const media::MediaFormat& format) {
     return row;
 }
 
-// Of a finished recording, as players count: where pictures are far apart, one is shown again each second.
+// A finished recording's frames as players count them: where pictures are far apart, one is repeated each second.
 int ShownFrames(const std::filesystem::path& recording, int written) {
     try {
         const archive::RecordingReader reader(recording);

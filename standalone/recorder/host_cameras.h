@@ -2,7 +2,7 @@
 //
 // The cameras that this host records, where several share the store: takes, keeps and gives up their leases.
 //
-// Why so        A store that nobody reaches must stop recording nowhere, and a host that alone is cut off
+// Why so        Recording must continue everywhere while no host reaches the store, and a host that alone is cut off
 //               cannot tell the two apart. So a host keeps what it held when it last reached the store. Once its
 //               heartbeat has stood still for long enough, the others take its floating cameras over, and then two
 //               record them, until it reaches the store again and learns within two seconds what it has lost: footage
@@ -41,7 +41,7 @@ class HostCameras {
     std::set<int> Held() const;
     // Another host has its lease, online or offline; also while that is not known yet.
     bool IsHeldElsewhere(int camera) const;
-    // The cameras still being recorded or written once the last Held() was acted upon.
+    // Call once the last Held() was acted upon: the cameras that are still being recorded or written.
     void NoteRecorded(std::set<int> cameras);
     // As in StoreThread.
     void RequestStop() { thread_.RequestStop(); }
@@ -70,9 +70,9 @@ class HostCameras {
     std::set<int> held_;
     std::optional<std::set<int>> held_elsewhere_;
     std::int64_t published_ = 0;     // times that held_ changed
-    mutable std::int64_t seen_ = 0;  // of these, when Held was called last
+    mutable std::int64_t seen_ = 0;  // published_ when Held was called last
     std::set<int> recorded_;
-    std::int64_t noted_ = -1;  // of these, what recorded_ follows
+    std::int64_t noted_ = -1;  // the published_ that recorded_ belongs to
     StoreThread thread_;       // last: it uses the others
 };
 

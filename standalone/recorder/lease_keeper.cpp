@@ -40,7 +40,7 @@ void LeaseKeeper::Release(store::Store& store) {
     }
 }
 
-// On a store with hosts, whoever is none of them would record what they record.
+// On a store with hosts, a machine that is none of them would record their cameras a second time.
 bool LeaseKeeper::IsRefused(store::Store& store) {
     store::Hosts hosts(store);
     std::string refusal;

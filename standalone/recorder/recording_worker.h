@@ -19,7 +19,7 @@ namespace lookhaven::recorder {
 
 class RecordingWorker {
   public:
-    // What may wait for a slow disk: about four seconds of large Motion JPEG, more of any other codec.
+    // How much may wait for a slow disk: about four seconds of large Motion JPEG, more of any other codec.
     static constexpr std::size_t kQueueBytes = 32 << 20;
 
     // Starts the thread, which takes no signals. What is borrowed must outlive the worker. Throws std::system_error
@@ -36,8 +36,8 @@ class RecordingWorker {
     // As the thread last published it, at most a quarter of a second old.
     maintenance::RecordingStatus State() const;
 
-    // Monotonic; up to when what had come was on the disk, or had been given up, half a second earlier at most. Stays
-    // behind while the disk lets the thread wait.
+    // Monotonic: all frames that had arrived by then are written or given up. Lags by half a second at most, and more
+    // while the disk is slow.
     std::int64_t WrittenUs() const { return written_us_; }
 
     // Asks the thread to record what is queued, close the event and end; does not wait.

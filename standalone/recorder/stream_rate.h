@@ -11,7 +11,7 @@ namespace lookhaven::recorder {
 
 class StreamRate {
   public:
-    // Call it about every second. A stream that was started anew counts from 0 again.
+    // Call it about every second. A stream that was restarted counts from 0 again.
     void Note(const StreamCounts& counts, std::int64_t now_us) {
         if (at_us_ != 0 && now_us > at_us_ && counts.pictures >= pictures_ && counts.bytes >= bytes_) {
             const double seconds = static_cast<double>(now_us - at_us_) / 1e6;

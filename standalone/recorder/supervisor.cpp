@@ -157,7 +157,7 @@ void Supervisor::PublishCounters() {
     counters_.Write(streams);
 }
 
-// A camera may be set up anew, or exchanged, without lookhaven being told.
+// A camera may be reconfigured or exchanged without anybody changing its record here.
 void Supervisor::CorrectVideoTypes() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     for (const auto& [stream, worker] : workers_) {

@@ -18,7 +18,7 @@ constexpr base::ProcessIdentity ProcessOf(std::uint64_t word) {
     return {static_cast<std::int32_t>(word & 0x3fffff), word >> 22};
 }
 
-// The calling process's word, kept between calls and read anew in a forked child.
+// The calling process's word, cached between calls and read again in a forked child.
 std::uint64_t OwnWord();
 
 inline bool IsWordAlive(std::uint64_t word) {

@@ -74,7 +74,7 @@ const Entry* ReadLatestIFrame(void* ring);
 void ReadFinish(void* ring, const Entry* entry, Position* position);
 void ReadIFrameFinish(void* ring, const Entry* entry, Position* position);
 
-// The writer has left this ring for good; a reader should attach anew.
+// The writer has left this ring for good; a reader should attach again.
 bool IsRetired(const void* ring);
 // The process that writes the ring is alive. Reads /proc: not for each frame.
 bool IsWriterAlive(const void* ring);

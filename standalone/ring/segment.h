@@ -12,8 +12,8 @@
 //               count again. All of these are sequentially consistent, so of a writer and a reader that meet, the
 //               writer sees the pin, or the reader sees that the entry is gone. The writer skips pinned regions.
 //
-// Trust         Whoever writes to a segment could change its geometry after the check. So an attachment copies the
-//               constants to memory of this process; what is checked is the copy, and only the copy is used.
+// Trust         A process that writes to a segment could change its geometry after the check. So an attachment copies
+//               the constants to memory of this process; what is checked is the copy, and only the copy is used.
 //
 // Invariants    (1) The constants do not change once magic is there.
 //               (2) A slot's region changes only while its count is 0, and no count is used twice.

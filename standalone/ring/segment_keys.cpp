@@ -53,7 +53,7 @@ void FillHead(SegmentHead& head, std::uint64_t installation, const StreamId& id,
               const Geometry& geometry) {
     SegmentConstants& constants = head.constants;
     constants.installation = installation;
-    std::atomic_signal_fence(std::memory_order_seq_cst);  // whoever dies from here on leaves a head that says whose
+    std::atomic_signal_fence(std::memory_order_seq_cst);  // from here on a dead writer leaves a head that names it
     constants.layout_version = kLayoutVersion;
     constants.generation = static_cast<std::uint32_t>(base::MonotonicMicros());
     constants.segment_bytes = SegmentBytes(geometry);

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Marks: alarms reported by a device, transactions reported by a POS terminal. Their footage is a span of a camera's
+// Marks: alerts reported by a device, transactions reported by a POS terminal. Their footage is a span of a camera's
 // recordings.
 //
-// Why so        Whoever reports one must not wait for the footage, which is complete only after the post-record time.
+// Why so        Reporting must not wait for the footage, which is complete only after the post-record time.
 //               So a mark is stored at once as pending, and the recorder, which owns the mounts, writes the span file.
 #pragma once
 
@@ -51,7 +51,7 @@ struct Mark {
     std::int64_t moment_s = 0;  // when it happened
     std::int64_t start_s = 0;   // the footage: with the camera's time before …
     std::int64_t end_s = 0;     // … and after
-    std::string text;           // lines separated by "\n": the receipt, or what the alarm said
+    std::string text;           // lines separated by "\n": the receipt, or the alert's text
     MarkState state = MarkState::kPending;
     int mount_id = 0;  // these two once it is saved
     std::string path;  // of the span file, relative to the mount
@@ -107,8 +107,8 @@ class Marks {
     std::vector<Mark> List(const MarkFilter& filter);
     // As Events::Next, among saved marks; of one kind, or of both.
     std::optional<Mark> Next(const Step& step, std::optional<MarkKind> kind);
-    // In the order of being reported, which is that of their ids: whoever draws an id holds the counter until the
-    // commit, so none becomes visible after a larger one. Without demo marks.
+    // In the order of being reported, which is that of their ids: the transaction that takes an id locks the counter
+    // until its commit, so none becomes visible after a larger one. Without demo marks.
     std::vector<Mark> ReportedAfter(int id, int limit);
     struct Report {
         int id = 0;

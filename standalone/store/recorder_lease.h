@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The recorder lease: only its holder, the active recorder, records the store's cameras, whatever machines reach the
-// store. Where hosts share the store (hosts.h), each has a lease, for its own recorder.
+// The recorder lease: of all recorders that reach the store, only the lease's holder records the store's cameras.
+// Where hosts share the store (hosts.h), each has a lease of its own, for its own recorder.
 //
 // Why so        Two recorders on one store would record every camera twice. The clocks of two hosts cannot be compared,
 //               so the holder counts up, and others take the lease over once the count has not changed for a while by
@@ -36,7 +36,7 @@ class RecorderLease {
     // host: whose lease; 0: the only one, of a store without hosts. The store must outlive this object.
     explicit RecorderLease(Store& store, int host = 0);
 
-    // That nobody has, for an unknown host; such a lease cannot be taken.
+    // For an unknown host: one without a holder, which cannot be taken.
     LeaseState Current();
     // Takes or renews the lease if its count is still that one. False when somebody else was faster.
     bool Take(std::int64_t count, const std::string& holder, int first_reserved_id);
