@@ -50,7 +50,7 @@ void Set(const Console& console, const Request& request) {
     if (!request.is_confirmed) {
         const Json::Value told = admin::ExamineCertificate(store, installation, {}, offer);
         if (const std::string hosts = Joined(told["pairedHosts"]); !hosts.empty()) {
-            throw Failure(kDataError, "these hosts know this one by its certificate, and must be paired anew: ", hosts,
+            throw Failure(kDataError, "these hosts know this one by its certificate, and must be paired again: ", hosts,
                           "; to replace it all the same, add --confirm");
         }
     }
@@ -62,7 +62,7 @@ void Set(const Console& console, const Request& request) {
     console.Answer(done, Text(done),
                    done["reloaded"].asBool() ? "The web server shows it.\n"
                                              : "The web server does not run; it shows it when it starts.\n",
-                   hosts.empty() ? "" : "To be paired anew: " + hosts + '\n');
+                   hosts.empty() ? "" : "To be paired again: " + hosts + '\n');
 }
 
 }  // namespace
@@ -74,7 +74,7 @@ void AddCertificate(CLI::App& program, const Console& console) {
     group.Add("set", "Replaces it, after a check of both files", Set)
         .Option("certificate", request.certificate, "PEM file: the server's certificate, then its issuers'", Required)
         .Option("key", request.key, "PEM file: its private key, without a password", Required)
-        .Flag("--confirm", request.is_confirmed, "Even where hosts must be paired anew");
+        .Flag("--confirm", request.is_confirmed, "Even where hosts must be paired again");
 }
 
 }  // namespace lookhaven::cli

@@ -131,16 +131,16 @@ class EmapTest(unittest.TestCase):
         self.command("emap", "add", "Harmful", str(harm))
         wait_until(lambda: recorded_events(self.server, 1), 30, "footage, before which nothing can have happened")
         for number in range(6):
-            sale = {"kind": "pos", "camera": 1, "text": f"Tea {number}"}
-            self.assertEqual(self.server.request(call("VEXO.Event", "Mark"), "admin", form=sale).status, 200)
+            transaction = {"kind": "pos", "camera": 1, "text": f"Tea {number}"}
+            self.assertEqual(self.server.request(call("VEXO.Event", "Mark"), "admin", form=transaction).status, 200)
         with Visit("maps.mjs", f"http://127.0.0.1:{self.server.port}/") as visit:
             seen = visit.see("shown")
             self.assertEqual((seen["items"], seen["picture"]), (9, [1200, 800]))
             self.assertEqual(visit.see("camera")["hash"], "#map=1&camera=1")
             self.assertEqual(visit.see("link")["hash"], "#map=2")
 
-            sales = visit.see("sales")["sales"]
-            self.assertEqual([sale.rpartition(" · ")[2] for sale in sales], [f"Tea {number}" for number in (5, 4, 3, 2, 1)])
+            transactions = visit.see("transactions")["transactions"]
+            self.assertEqual([each.rpartition(" · ")[2] for each in transactions], [f"Tea {number}" for number in (5, 4, 3, 2, 1)])
 
             seen = visit.see("moved")
             self.assertEqual(seen["undone"], seen["before"])

@@ -39,9 +39,9 @@ await visit(async (page, complaints) => {
   await report("link", { hash: new URL(page.url()).hash });
   await page.goBack();
   await item(page, "POS terminal").click();
-  await page.locator(".map-card-sales li").first().waitFor();
-  await page.screenshot({ path: `${folder}/sales.png` });
-  await report("sales", { sales: await page.locator(".map-card-sales li").allTextContents() });
+  await page.locator(".map-card-transactions li").first().waitFor();
+  await page.screenshot({ path: `${folder}/transactions.png` });
+  await report("transactions", { transactions: await page.locator(".map-card-transactions li").allTextContents() });
   await page.keyboard.press("Escape");
 
   await page.getByRole("button", { name: "Edit the map" }).click();

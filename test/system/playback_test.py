@@ -155,7 +155,7 @@ class PlaybackTest(DemoFootageTest):
         self.assertEqual(done.stderr, b"")
         return done.stdout.decode()
 
-    def test_plays_the_footage_of_alerts_and_sales(self):
+    def test_plays_the_footage_of_alerts_and_transactions(self):
         for kind, kind_number in (("alert", 1), ("pos", 2)):
             mark, recording = self.mark(kind)
             times = []

@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+//
+// Measures the sound of a page.
 
 /** Takes sound where it leaves the page: its loudest sample is window.sound.peak. Runs in the page, before its scripts. */
 export function observeSound() {

@@ -20,7 +20,7 @@ const kPauseMs = 5_000;
 /** What happened longer ago was missed. */
 const kMaxNewsAgeS = 60;
 
-/** Runs until `signal` is aborted. Kinds that `admits` refuses are left out. */
+/** Runs until `signal` is aborted. Kinds that `admits` refuses are skipped. */
 export async function watchAlerts(
   server: Server,
   isBrief: boolean,
@@ -46,7 +46,7 @@ export async function watchAlerts(
         if (admits(mark.kind)) server.alerts.note(mark, mark.time > nowS + performance.now() / 1000 - kMaxNewsAgeS);
       }
       backoff.reset();
-      // Of what was missed, less may be told than was announced: what was denied meanwhile is not.
+      // Fewer missed events may come than were announced: those denied meanwhile do not.
       const isAll = missed <= 0 || (name !== "start" && name !== "mark");
       if (isAll) server.alerts.catchUp();
       isTold = isBrief && isAll;
@@ -61,7 +61,7 @@ export async function watchAlerts(
         if (isTold) break;
       }
     } catch (error) {
-      // The next attempt goes on where this one was, unless that is no place of this server.
+      // The next attempt continues where this one was, unless that is no place of this server.
       if (asServerError(error).status === kBadRequest) place = "";
     } finally {
       deadline.release();

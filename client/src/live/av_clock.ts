@@ -43,7 +43,7 @@ export class TimestampMatcher {
     this.#sentUs.push(us);
   }
 
-  /** Of the timestamps sent since the last chunk, the one nearest to the corrected count. */
+  /** The timestamp sent since the last chunk that is nearest to the corrected count. */
   decoded(countedUs: number): number {
     const expectedUs = countedUs + this.#behindUs;
     const distance = (us: number) => Math.abs(us - expectedUs);

@@ -3,7 +3,7 @@
 // Where live pictures come from; each way of getting them is one implementation.
 
 export interface Frame {
-  /** Whoever receives the frame draws it and closes it. */
+  /** The receiver of the frame draws it and closes it. */
   readonly image: ImageBitmap | VideoFrame;
   /** Unix milliseconds of the capture, by the server's clock. */
   readonly capturedMs: number;
@@ -14,7 +14,7 @@ export interface Frame {
 export interface LiveSource {
   /** Without a new picture for this long the signal counts as lost. */
   readonly lostAfterMs: number;
-  /** Of a source that polls for pictures; 0 for a stream. */
+  /** For a source that polls for pictures; 0 for a stream. */
   readonly pollIntervalMs: number;
   /**
    * Shows pictures until `signal` is aborted or the connection ends (both resolve) or fails (rejects with a

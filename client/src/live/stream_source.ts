@@ -47,7 +47,7 @@ export class NewestFrame {
     while (this.#waiting) {
       const part = this.#waiting;
       this.#waiting = null;
-      // A picture that cannot be decoded is left out; if none can, the signal is lost by the clock.
+      // A picture that cannot be decoded is dropped; if none can, the signal is lost by the clock.
       await this.#show(part).catch(() => undefined);
     }
     this.#busy = false;

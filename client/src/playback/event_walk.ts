@@ -55,7 +55,7 @@ export class EventWalk {
   }
 
   /**
-   * As peek, but waits for the answer; nothing at the end is asked for anew, since recording goes on. Rejects with a
+   * As peek, but waits for the answer; nothing at the end is asked for again, since recording continues. Rejects with a
    * ServerError.
    */
   async find(by: Direction): Promise<Footage | null> {

@@ -14,7 +14,7 @@ import { RecordedSound } from "./recorded_sound";
 import { kNotStreamed } from "./video_decoding";
 import { readVideo } from "./video_stream";
 
-/** Faster, most frames are left out, which is less work for the server. */
+/** Faster, most frames are dropped, which is less work for the server. */
 const kMaxVideoRate = 2;
 
 /** What cameras send: the main profile, up to level 5. */
@@ -45,7 +45,7 @@ export class FootageStream {
     this.sound = new RecordedSound(changed);
   }
 
-  /** Whether the stream that runs can go on at that rate, and is of the kind that is best for it. */
+  /** Whether the stream that runs can continue at that rate, and is of the kind that is best for it. */
   canChangeTo(footage: Footage, rate: number): boolean {
     return !this.#isVideo && !this.#takesVideo(footage, rate);
   }

@@ -3,7 +3,7 @@
 // Plays footage from a frame on to its end, in as many streams as that takes.
 //
 // Why so        The stream of a growing recording continues as it grows, and ends with it. Where the connection is
-//               lost, another stream goes on from the frame on the screen.
+//               lost, another stream continues from the frame on the screen.
 
 import { delay } from "../wire/delay";
 import { newStreamKey, type Recordings } from "../wire/recordings";
@@ -27,7 +27,7 @@ const kMaxSilentStreams = 2;
 /** Where the frames go. */
 export interface PlaybackSink {
   readonly shown: ShownFrame;
-  /** Shows a frame when it is due, or leaves it out; the next is fetched when that is done. */
+  /** Shows a frame when it is due, or drops it; the next is fetched when that is done. */
   take(frame: RecordedFrame): Promise<void>;
   /** The connection was lost; it is tried again until it is back. */
   lost(): void;
@@ -42,7 +42,7 @@ export class Playback {
   readonly #sink: PlaybackSink;
   #rate: number;
   #isStreaming = false;
-  /** Of the stream that sends frames; 0 while none does. */
+  /** The key of the stream that sends frames; 0 while none does. */
   #key = 0;
   #silentStreams = 0;
 
@@ -55,8 +55,8 @@ export class Playback {
   }
 
   /**
-   * Plays to the end, or until another player of this session takes over. Rejects with a ServerError where it cannot go
-   * on; resolves with null when `signal` is aborted.
+   * Plays to the end, or until another player of this session takes over. Rejects with a ServerError where it cannot
+   * continue; resolves with null when `signal` is aborted.
    */
   async run(from: number, signal: AbortSignal): Promise<"ended" | "preempted" | null> {
     const { shown } = this.#sink;

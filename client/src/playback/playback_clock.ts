@@ -6,7 +6,7 @@
 //               the rate when it has reached them, and a busy server or a slow connection delays each by something
 //               else. So a frame waits here until it is due, and the clock waits for players whose next frame has not
 //               come. That wait is made once: from then on the frames of this player come early enough. A player that
-//               is waited for in vain is left behind, and has to join anew.
+//               is waited for in vain is left behind, and has to join again.
 // Invariants    (1) Only `set` turns the clock back. (2) Of a player that is not left behind, the frame on the screen
 //               is the one of the clock's time, or that before it while the next is on its way.
 
@@ -53,7 +53,7 @@ export class PlaybackClock {
     return this.#atMs;
   }
 
-  /** Goes to a time and runs from there, or stands still. All players have to join anew. */
+  /** Goes to a time and runs from there, or stands still. All players have to join again. */
   set(atMs: number, isRunning: boolean): void {
     for (const who of [...this.#members.keys()]) this.leave(who);
     this.#atMs = atMs;
@@ -92,7 +92,7 @@ export class PlaybackClock {
     this.#plan();
   }
 
-  /** Whether the player would have to join anew to be in step. */
+  /** Whether the player would have to join again to be in step. */
   isLeftBehind(who: object): boolean {
     return this.#members.get(who)?.isLeftBehind ?? false;
   }

@@ -22,7 +22,7 @@ import { startAt, startOfStep, type Start } from "./start";
 export class Player {
   /**
    * Resolves when a frame of a stream, of that Unix time in milliseconds, is to be shown; with false where it is to be
-   * left out.
+   * dropped.
    */
   pace: (positionMs: number, signal: AbortSignal) => Promise<boolean> = () => Promise.resolve(true);
   /** Draws a frame unless it is not wanted any more; the next is fetched when it is done. */
@@ -56,7 +56,7 @@ export class Player {
     return this.#state;
   }
 
-  /** Of the frame on the screen. */
+  /** The number of the frame on the screen. */
   get index(): number {
     return this.#shown.index;
   }
@@ -218,7 +218,7 @@ export class Player {
   }
 
   async #showFrame(frame: RecordedFrame, signal: AbortSignal): Promise<void> {
-    // A frame that cannot be decoded is left out, and counts as shown.
+    // A frame that cannot be decoded is dropped, and counts as shown.
     await this.show(frame, signal).catch(() => undefined);
     if (signal.aborted) return;
     this.#opening = null;

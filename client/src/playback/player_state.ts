@@ -9,7 +9,8 @@ export type PlayerState =
   /** The server ended the stream before its end: another player of this session has taken over. */
   | { kind: "preempted" }
   /**
-   * The connection was lost while playing; it is tried again until it is back, and goes on at the frame on the screen.
+   * The connection was lost while playing; it is tried again until it is back, and playback continues at the frame on
+   * the screen.
    */
   | { kind: "lost" }
   | { kind: "failed"; reason: string };

@@ -3,7 +3,7 @@
 // Which days have recordings, in days of the user's own time zone.
 //
 // Why so        The server counts days of 24 hours from any start. Local midnights are 24 hours apart but for two days
-//               a year, so a request for many days is split there. Of a day of 25 hours the last hour is left out; one
+//               a year, so a request for many days is split there. Of a day of 25 hours the last hour is ignored; one
 //               of 23 hours includes the first hour of the next.
 
 import type { Recordings } from "../wire/recordings";

@@ -4,7 +4,7 @@
 //
 // Why so        A pointer asks for sixty times a second, and each picture is a process on the server. What was not
 //               begun before the next time was asked for is never fetched. The active camera comes first; the others
-//               get theirs when the pointer rests. Pictures that come in another order are left out, so that they only
+//               get theirs when the pointer rests. Pictures that come in another order are dropped, so that they only
 //               go the way of the pointer. A picture is that of a key frame, which stands for every time until the one
 //               it was asked for: within seconds of H.264 nothing more is fetched.
 

@@ -3,7 +3,7 @@
 // Which frame is on the screen, and what time it is there.
 //
 // Why so        The caption tells when the picture was taken. A slow camera's picture is repeated each second until the
-//               next comes: the playhead goes on meanwhile.
+//               next comes: the playhead continues meanwhile.
 
 import type { RecordedFrame } from "./frame_stream";
 
@@ -14,7 +14,7 @@ export class ShownFrame {
   #index = 0;
   #capturedMs = 0;
   #positionMs = 0;
-  /** Of the first frame of a run, which repeats nothing: when at the earliest it is due; null once it is shown. */
+  /** When the first frame of a run, which repeats nothing, is due at the earliest; null once it is shown. */
   #dueFromMs: number | null = null;
   /** By performance.now(). */
   #shownMs = 0;

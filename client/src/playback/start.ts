@@ -12,12 +12,13 @@ export type Start = FrameStart | { atMs: number };
 const kStepBackFrames = 12;
 
 export function startAt({ start, frameCount }: Footage, atMs: number): Start {
-  // Of a mark nobody has told how many frames it has.
+  // How many frames a mark has is not known.
   return atMs <= start * 1000 && frameCount > 0 ? { index: 0 } : { atMs: Math.round(atMs) };
 }
 
 /**
- * Of a step by so many frames to `index`. The frames before come with a step back, since more such steps may follow.
+ * The start of a step by so many frames to `index`. The frames before come with a step back, since more such steps may
+ * follow.
  */
 export function startOfStep(index: number, by: number): Start {
   return by < 0 ? { index, from: Math.max(0, index - kStepBackFrames + 1) } : { index };

@@ -14,7 +14,7 @@ import { isPassing } from "./failure_reason";
 const kTailSilenceMs = 1_500;
 
 export type StreamEnd =
-  /** More: another stream goes on from here. The footage is as the server has it now. */
+  /** More: another stream continues from here. The footage is as the server has it now. */
   | { kind: "more" | "ended" | "preempted"; footage: Footage }
   /** The server does not answer. */
   | { kind: "lost" }
@@ -26,7 +26,7 @@ export interface LastFrame {
   index: number;
   ageMs: number;
   rate: number;
-  /** Of the whole footage, as far as is known. */
+  /** Frames of the whole footage, as far as is known. */
   frameCount: number;
   /** The server says that there is nothing more. */
   isWhole: boolean;

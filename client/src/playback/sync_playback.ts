@@ -4,7 +4,7 @@
 //
 // Why so        Recordings of a camera follow each other without a gap, or with hours between. One clock says which
 //               moment is shown; a camera that has nothing then joins as soon as it has. Where none has anything, the
-//               clock goes on to whatever comes next on any camera. One camera is active: steps are frames of it,
+//               clock continues with whatever comes next on any camera. One camera is active: steps are frames of it,
 //               and a pause shows what each camera had at the time of its picture.
 
 import type { Footage } from "../wire/footage";
@@ -155,7 +155,7 @@ export class SyncPlayback {
     this.#changed();
   }
 
-  /** Of the active camera. Call it while handling a click or key. */
+  /** For the active camera. Call it while handling a click or key. */
   toggleSound(): void {
     const sound = this.#active?.player.sound;
     if (sound?.isOn) sound.switchOff();

@@ -26,13 +26,13 @@ export interface FrameFacts {
 }
 
 export interface DecodedFrame extends FrameFacts {
-  /** Whoever takes the frame closes it. */
+  /** The caller of `take` closes it. */
   picture: VideoFrame;
 }
 
 export class VideoDecoding {
   readonly #changed: () => void;
-  /** Of the frames that are in the decoder. */
+  /** What is known of the frames in the decoder, by timestamp. */
   readonly #facts = new Map<number, FrameFacts>();
   readonly #ready: DecodedFrame[] = [];
   #decoder: VideoDecoder | null = null;

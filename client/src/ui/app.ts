@@ -50,7 +50,7 @@ export class App {
   #account: Account | null = null;
   /** Null where there is no account. */
   #preferences: Preferences | null = null;
-  /** Of the account that was the last to log in. */
+  /** The account that was the last to log in. */
   #remembered = rememberedFor(0);
   /** Null at the log-in. */
   #screen: Screen | null = null;

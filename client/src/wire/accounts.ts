@@ -17,7 +17,7 @@ export function byRight<Value>(value: (right: CameraRight) => Value): Record<Cam
 
 /** Ids of what a viewer may not see. */
 export interface Denied extends Record<CameraRight, number[]> {
-  /** Of groups: what is denied holds for all of their cameras. */
+  /** Groups: what is denied holds for all of their cameras. */
   group: Record<CameraRight, number[]>;
   emap: number[];
   door: number[];
@@ -97,12 +97,12 @@ export class Accounts {
     return this.#call("Remove", { id, revision, reauth });
   }
 
-  /** Of the caller's own account where none is named. */
+  /** Those of the caller's own account where none is named. */
   async sessions(id?: number): Promise<OpenSession[]> {
     return (await this.#call<{ session: OpenSession[] }>("Sessions", { id })).session;
   }
 
-  /** Of that account, or of the caller's own. Without a key, all but the one that asks. Returns how many ended. */
+  /** Ends sessions of that account, or of the caller's own; without a key all but the asking one. Returns how many. */
   async endSessions(id?: number, key?: string): Promise<number> {
     return (await this.#call<{ ended: number }>("EndSessions", { id, key })).ended;
   }
@@ -112,7 +112,7 @@ export class Accounts {
     return (await this.#call<{ camera: SeenCamera[] }>("Preview", { id })).camera;
   }
 
-  /** Of the caller, who need not be a manager. A wrong password is rejected with status 403. */
+  /** Changes the caller's own, who need not be a manager. A wrong password is rejected with status 403. */
   changePassword(password: string, newPassword: string): Promise<unknown> {
     return this.#call("ChangePassword", { password, newPassword });
   }

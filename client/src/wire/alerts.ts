@@ -2,8 +2,8 @@
 //
 // What was reported since the user looked, and at which cameras just now.
 //
-// Why so        The stream of reports goes on from where the user last looked, also after the page was left. So what is
-//               new is counted anew from the store, and is the same in all tabs of a browser; where the user looks in
+// Why so        The stream of reports continues where the user last looked, also after the page was left. So what is
+//               new is counted again from the store, and is the same in all tabs of a browser; where the user looks in
 //               one of them, the others hear of it.
 
 import type { RawMark } from "./footage";
@@ -125,7 +125,7 @@ export class Alerts {
   }
 }
 
-/** Of the report at that place of the stream. */
+/** The id of the report at that place of the stream. */
 function idAt(place: string): number {
   return parseInt(place, 10) || 0;
 }

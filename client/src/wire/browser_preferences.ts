@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What earlier versions kept in the browser, for whoever used it, by the names that it has now.
+// What earlier versions kept in the browser, for each user of it, by the names that it has now.
 
 const kLayout = "lookhaven.layout";
 const kOrder = "lookhaven.order";

@@ -18,9 +18,9 @@ export interface DevicePort {
 /** What a manager may change. */
 export interface DeviceSettings {
   name: string;
-  /** Of a door or POS terminal, as of a port. */
+  /** For a door or POS terminal, as for a port. */
   camera: number;
-  /** Of an I/O module. */
+  /** For an I/O module. */
   port: DevicePort[];
 }
 

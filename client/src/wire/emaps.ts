@@ -28,7 +28,7 @@ export interface MapItem {
 
 /** An item as a viewer gets it. */
 export interface ViewerItem extends MapItem {
-  /** Of a camera, and of one that watches the device; null where there is none. */
+  /** The camera itself, or the one that watches the device; null where there is none. */
   camera: Pick<Camera, "id" | "server"> | null;
   videoType: number;
   /** 3 an input, 1 an output, 0 neither. */

@@ -9,7 +9,7 @@ import { address, type Server } from "./server";
 export interface ExportPlan {
   sizeBytes: number;
   files: number;
-  /** Of the cameras that were not recorded all the time, how much there is not. */
+  /** How much is missing of the cameras that were not recorded all the time. */
   missing: { camera: string; seconds: number }[];
 }
 

@@ -17,7 +17,7 @@ export function isSameFootage(one: FootageRef, other: FootageRef | null | undefi
   return one.kind === other?.kind && one.id === other.id;
 }
 
-/** What a mark says and who says so, and why it is kept, a line each; empty for a recording that is not kept. */
+/** What a mark says and who reported it, and why it is kept, a line each; empty for a recording that is not kept. */
 export function describe({ text, reporter, isKept, note, keeper }: Footage): string {
   const kept = isKept && `Kept${keeper && ` by ${keeper}`}${note && `: ${note}`}`;
   return [text, reporter && `Reported by ${reporter}`, kept].filter(Boolean).join("\n");
@@ -28,7 +28,7 @@ export interface Footage extends FootageRef {
   camera: number;
   /** Unix seconds. */
   start: number;
-  /** Of a growing recording, how far it can be played now. */
+  /** How far a growing recording can be played now. */
   stop: number;
   /** When a mark's event happened; its footage begins before. */
   moment: number;
@@ -37,7 +37,7 @@ export interface Footage extends FootageRef {
   isGrowing: boolean;
   /** The server's number for why it was recorded; 0 for marks. */
   reason: number;
-  /** Of a mark, else empty. */
+  /** A mark's text, else empty. */
   text: string;
   /** Where it was found by its text: the lines of that in pieces, of which every second one was looked for. */
   found?: readonly (readonly string[])[] | undefined;
@@ -47,7 +47,7 @@ export interface Footage extends FootageRef {
   isSaved: boolean;
   /** Retention leaves it alone. Of a mark known only where it was looked up by itself. */
   isKept: boolean;
-  /** Why it is kept, and who says so; empty where that is not known. */
+  /** Why it is kept, and which account says so; empty where that is not known. */
   note: string;
   keeper: string;
 }

@@ -5,7 +5,7 @@
 export interface LastLook {
   /** The id of that report in the server's stream; empty where it is not known. */
   readonly place: string;
-  /** Of what was reported before, some may never have been told. */
+  /** Some of what was reported before may never have been shown. */
   readonly mayBeMore: boolean;
 }
 

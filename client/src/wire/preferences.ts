@@ -7,7 +7,7 @@
 //               server that fails holds nobody up: a session without what was preferred is better than none.
 //               What belongs to one browser alone stays there: notifications (alert_notifications). Sound and full
 //               screen take a click each time, without which browsers allow neither.
-//               Records, named saved.…, are another matter: whoever saves one must know whether the server took it,
+//               Records, named saved.…, are another matter: a user who saves one must know whether the server took it,
 //               and those of other tabs and browsers are to be seen.
 // Invariants    (1) Only what was changed here is told, by name: what another tab changes stays.
 //               (2) It is told for the account that was asked for: once somebody else has logged in in another tab,
@@ -28,7 +28,7 @@ export class Preferences {
   readonly #server: Server;
   readonly #user: number;
   readonly #values: Values;
-  /** Of these, what the server has not taken. */
+  /** Those of them that the server has not taken. */
   #changes: Values = {};
   #takesOver = false;
   #debounce: ReturnType<typeof setTimeout> | undefined;

@@ -55,7 +55,7 @@ export interface EventCursor {
   kinds: readonly EventKind[];
   /** Unix seconds. */
   atS: number;
-  /** Of the event there; without one, what begins at that very second is no neighbour. */
+  /** The id of the event there; without one, what begins at that very second is no neighbour. */
   id?: number | undefined;
 }
 
@@ -67,7 +67,7 @@ export interface Still {
 
 export interface FrameOfTime {
   index: number;
-  /** Of the whole footage, now. */
+  /** Frames of the whole footage, now. */
   frameCount: number;
 }
 
@@ -155,7 +155,7 @@ export class Recordings {
   }
 
   /** The newest POS transactions of a camera. */
-  async sales(camera: number, count: number): Promise<Footage[]> {
+  async latestTransactions(camera: number, count: number): Promise<Footage[]> {
     const asked = { kind: "pos", limit: String(count), cameralists: String(camera) };
     const { event } = await this.#server.call<{ event: RawMark[] }>("VEXO.Event", "List", asked, { quiet: true });
     return event.map(markOf);

@@ -210,7 +210,7 @@ export class Server {
 
   /**
    * The data of an answer. With `form` or `json` the request is a POST. Unless `quiet`, an ended session is reported.
-   * `signal` ends the request. With `keepalive` it goes on when the page is left.
+   * `signal` ends the request. With `keepalive` it continues when the page is left.
    */
   async call<Data>(
     api: string,

@@ -50,7 +50,7 @@ describe("a player of video", () => {
     expect(archive.asked[1]).toBe("event7 video 0 at 1");
   });
 
-  test("pause closes the stream; steps are pictures, and playing goes on as video", async () => {
+  test("pause closes the stream; steps are pictures, and playback continues as video", async () => {
     player.open(footage(), 0, true);
     await untilFrame(3);
     player.pause();

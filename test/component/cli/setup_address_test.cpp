@@ -98,7 +98,7 @@ TEST_F(SetupAddress, CertificatesAreReplacedOnceTheirFilesAreChecked) {
     store::Store store = Open();
     store::RecordingServers(store).Add({.name = "Watcher"}, std::string(64, 'a'));
     const std::string other = "certificate set " + own + "2.pem " + own + "2.key";
-    Play({{other, 65, "must be paired anew: Watcher"}, {other + " --confirm", 0, "To be paired anew: Watcher"}});
+    Play({{other, 65, "must be paired again: Watcher"}, {other + " --confirm", 0, "To be paired again: Watcher"}});
     EXPECT_THAT(Run("audit").text, HasSubstr("certificate.set"));
 }
 

@@ -12,7 +12,7 @@ import { SnapshotDialog } from "./snapshot_dialog";
 export interface CameraOverlayActions {
   /** The user wants to see again what the large view covers. */
   back(): void;
-  /** Goes on to the next camera (1) or the previous one (-1); absent where there is no order. */
+  /** Goes to the next camera (1) or the previous one (-1); absent where there is no order. */
   step?(by: 1 | -1): void;
 }
 

@@ -19,7 +19,7 @@ import { recordingsButtons } from "./recordings_buttons";
 
 export interface LargeViewActions {
   back(): void;
-  /** Goes on to the next camera (1) or the previous one (-1); absent where there is no order. */
+  /** Goes to the next camera (1) or the previous one (-1); absent where there is no order. */
   step?(by: 1 | -1): void;
   snapshot(): void;
 }

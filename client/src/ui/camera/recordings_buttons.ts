@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+//
+// Buttons from a camera's live picture to its recordings.
 
 import type { Camera } from "../../wire/server";
 import { cameraAddress } from "../screens/events_route";
@@ -6,7 +8,7 @@ import { iconButton } from "../widgets/button";
 
 const kRecentMs = 30_000;
 
-/** From a camera's live picture to what was recorded of it; none for a paired host's camera, which records there. */
+/** None for a paired host's camera, which records there. */
 export function recordingsButtons({ id, name, server }: Camera): HTMLButtonElement[] {
   if (server) return [];
   const go = (atMs: number | null) => void (location.hash = cameraAddress(id, atMs));

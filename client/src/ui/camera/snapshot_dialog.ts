@@ -25,7 +25,7 @@ export class SnapshotDialog {
     return this.root.open;
   }
 
-  /** Of the camera's live picture, or of what `picture` gives. */
+  /** Takes the camera's live picture, or what `picture` gives. */
   async take(camera: Camera, picture = (signal: AbortSignal) => this.#server.snapshot(camera, signal)): Promise<void> {
     this.#clear();
     const request = (this.#request = new AbortController());

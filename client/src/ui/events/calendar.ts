@@ -22,7 +22,7 @@ export class Calendar {
   readonly #body = element("div", { class: "calendar-days", role: "group" });
   #monthMs = monthOf(Date.now());
   #selectedMs = midnight(Date.now());
-  /** Of what is playing; null while nothing is. */
+  /** What is playing; null while nothing is. */
   #playingMs: number | null = null;
 
   /** Days of any of `cameras`. `onPick` gets a day's midnight. */
@@ -60,7 +60,7 @@ export class Calendar {
     return this.#cells.some(({ classList }) => classList.contains("has"));
   }
 
-  /** Of some day of the month that is shown it is not known yet. */
+  /** Not all days of the month that is shown are known yet. */
   get isLoading(): boolean {
     const cameras = this.#cameras();
     const days = this.#cells.filter(({ disabled }) => !disabled).map(({ dataset }) => Number(dataset["day"]));

@@ -13,7 +13,7 @@ import { StillLoader } from "./still_loader";
 
 /** Rows kept beyond the visible ones, so that scrolling shows no gap. */
 const kOverscanRows = 4;
-/** Of a still, on a screen with two pixels to each of the page's. */
+/** The width of a still, on a screen with two pixels to each of the page's. */
 const kStillPx = 176;
 
 export const kKindNames: Record<EventKind, string> = {

@@ -16,7 +16,7 @@ import type { Stage } from "./stage";
 import { layoutFor, planOf } from "./stage_layout";
 import { kTimeExamples, typedTime } from "./typed_time";
 
-/** Of so many it is looked up what they have at a moment. */
+/** The most cameras that are asked what they have at a moment. */
 const kMaxLookedUp = 64;
 
 export class EventsJumps {

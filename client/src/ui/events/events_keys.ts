@@ -69,7 +69,7 @@ function pressLetter(key: string, actions: EventsActions): boolean {
   return true;
 }
 
-/** From day to day, from row to row and along the timeline, for whoever came there with the keyboard. */
+/** From day to day, from row to row and along the timeline, for keyboard users. */
 function isForPart(event: KeyboardEvent): boolean {
   const target = event.target as Element;
   const isWithin = (selector: string) => !hasFocusByPointer() && target.closest(selector) !== null;

@@ -9,7 +9,7 @@ import type { Footage, FootageRef } from "../../wire/footage";
 export interface EventRow {
   /** What the row opens: of several recordings the first. */
   readonly footage: Footage;
-  /** Of all of them, the first included. */
+  /** The number of all of them, the first included. */
   readonly ids: readonly number[];
   /** How much was recorded, in seconds. */
   readonly seconds: number;
@@ -44,7 +44,7 @@ export function foldContinuous(footage: readonly Footage[]): EventRow[] {
   return [...rows.values()];
 }
 
-/** Of the browser's time zone, which may be a quarter of an hour away from UTC's. */
+/** In the browser's time zone, which may be a quarter of an hour away from UTC's. */
 function hourOf(unixS: number): number {
   return new Date(unixS * 1000).setMinutes(0, 0, 0);
 }

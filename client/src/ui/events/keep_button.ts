@@ -62,7 +62,7 @@ export class KeepButton {
     const { isKept = false, note = "", keeper = "" } = this.#footage ?? {};
     const told = `Kept${keeper && ` by ${keeper}`}${note && `: ${note}`}`;
     const label = isKept ? told : "Keep this recording";
-    // Who may not change it sees it where there is something to see.
+    // An account that may not change it sees it where there is something to see.
     this.root.hidden = !this.#isManager && !isKept;
     this.root.disabled = !this.#footage || !this.#isManager;
     this.root.dataset["kept"] = String(isKept);

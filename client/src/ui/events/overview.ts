@@ -126,7 +126,7 @@ export class Overview {
     this.#showFootage();
   }
 
-  /** Whether a day has recordings is asked anew: retention deletes them. */
+  /** Whether a day has recordings is asked again: retention deletes them. */
   forgetDays(): void {
     this.#days.clear();
   }

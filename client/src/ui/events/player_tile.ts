@@ -144,7 +144,7 @@ function sentenceFor(state: PlayerState, playheadMs: number | null): string {
     case "failed":
       return state.reason;
     case "lost":
-      return "The connection was lost. Playing goes on as soon as it is back.";
+      return "The connection was lost. Playback continues as soon as it is back.";
     case "preempted":
       return "Playback was stopped because another window of this session started playing.";
     default:

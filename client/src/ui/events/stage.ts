@@ -99,7 +99,7 @@ export class Stage {
     }
   }
 
-  /** Of the active camera; null where nothing is shown of it. */
+  /** The active camera's; null where nothing is shown of it. */
   snapshot(): { camera: Camera; picture: Promise<Snapshot> } | null {
     const camera = this.#cameras.find(({ id }) => id === this.active);
     const picture = camera ? this.#tiles.get(camera.id)?.snapshot() : null;

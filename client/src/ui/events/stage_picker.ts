@@ -17,7 +17,7 @@ export class StagePicker {
   readonly root = element("div", { class: "segments", role: "group", "aria-label": "Layout" });
   readonly #buttons: (readonly [StageLayout, HTMLButtonElement])[];
 
-  /** Of more than `maxPlayers` cameras the layouts are not offered. */
+  /** Layouts of more than `maxPlayers` cameras are not offered. */
   constructor(maxPlayers: number, chosen: (layout: StageLayout) => void) {
     this.#buttons = kStageLayouts.map((layout) => [layout, iconButton(...kLabels[layout], () => chosen(layout))] as const);
     for (const [layout, button] of this.#buttons) {

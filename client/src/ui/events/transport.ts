@@ -23,7 +23,7 @@ export interface TransportActions {
   rate(rate: number): void;
   /** By so many milliseconds. */
   jump(ms: number): void;
-  /** Of the active camera's picture. */
+  /** For the active camera's picture. */
   snapshot(): void;
   /** To a time that is typed. */
   askTime(): void;
@@ -143,7 +143,7 @@ export class Transport {
     this.#snapshot.disabled = !footage || !mayDownload;
   }
 
-  /** Of these cameras no recording can be downloaded from then on. */
+  /** No recording of these cameras can be downloaded from then on. */
   deny(denied: ReadonlySet<number>): void {
     this.#denied = denied;
     this.refresh();

@@ -37,7 +37,7 @@ export function typedTime(text: string, nowMs: number): number | null {
   return dayMs === null ? null : onDay(dayMs);
 }
 
-/** Of today and the days before, the last on that weekday (any, where it is empty) that is not still to come. */
+/** The last day up to today on that weekday (any, where it is empty) on which the time is not still to come. */
 function lastOf(weekday: string, onDay: (dayMs: number) => number, nowMs: number): number | null {
   for (let back = 0; back <= 7; back += 1) {
     const dayMs = midnight(nowMs, -back);

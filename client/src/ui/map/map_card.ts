@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // A card beside the item that is pointed at: what it is, its state, and what its camera sees now; of a POS terminal the
-// last sales.
+// latest transactions.
 
 import { SnapshotSource } from "../../live/snapshot_source";
 import type { Footage } from "../../wire/footage";
@@ -13,8 +13,8 @@ import { draw, element, setText } from "../widgets/dom";
 import { clockTime, minuteText, shortDate } from "../widgets/text";
 import { kindName, type MapItemView } from "./map_item";
 
-/** How many a POS terminal's card lists. */
-const kSales = 5;
+/** How many the card of a POS terminal lists. */
+const kTransactions = 5;
 
 export class MapCard {
   readonly root = element("div", { class: "card map-card", hidden: true });
@@ -23,7 +23,7 @@ export class MapCard {
   readonly #text = element("p", { class: "quiet" });
   readonly #canvas = element("canvas", { role: "img" });
   readonly #recordings: Recordings;
-  readonly #sales = element("ul", { class: "map-card-sales", "aria-label": "Last sales" });
+  readonly #transactions = element("ul", { class: "map-card-transactions", "aria-label": "Last transactions" });
   /** To what was recorded of its camera. */
   readonly #links = element("div", { class: "map-card-links" });
   readonly #open = element("button", { type: "button", class: "button" }, "Open its camera");
@@ -34,7 +34,7 @@ export class MapCard {
   constructor(server: Server) {
     this.#server = server;
     this.#recordings = new Recordings(server);
-    this.root.append(this.#canvas, this.#title, this.#text, this.#sales, this.#open, this.#links);
+    this.root.append(this.#canvas, this.#title, this.#text, this.#transactions, this.#open, this.#links);
   }
 
   get isPinned(): boolean {
@@ -57,14 +57,14 @@ export class MapCard {
     this.#canvas.hidden = true;
     this.#open.hidden = open === null;
     this.#links.replaceChildren(...(open && camera ? recordingsButtons(camera) : []));
-    this.#sales.replaceChildren();
+    this.#transactions.replaceChildren();
     this.root.classList.toggle("is-pinned", open !== null);
     this.#open.onclick = open;
     this.root.hidden = false;
     this.#placeBeside(view);
     if (!camera) return;
     void this.#showPicture(camera, view);
-    if (view.item.kind === "pos" && !camera.server) void this.#showSales(camera, view);
+    if (view.item.kind === "pos" && !camera.server) void this.#showTransactions(camera, view);
   }
 
   hide(): void {
@@ -89,10 +89,10 @@ export class MapCard {
     await source.run(show, polling.signal).catch(() => undefined);
   }
 
-  async #showSales(camera: Camera, view: MapItemView): Promise<void> {
-    const sales = await this.#recordings.sales(camera.id, kSales).catch(() => []);
+  async #showTransactions(camera: Camera, view: MapItemView): Promise<void> {
+    const transactions = await this.#recordings.latestTransactions(camera.id, kTransactions).catch(() => []);
     if (this.#shown !== view) return;
-    this.#sales.replaceChildren(...sales.map(saleRow));
+    this.#transactions.replaceChildren(...transactions.map(transactionRow));
     this.#placeBeside(view);
   }
 
@@ -117,8 +117,8 @@ export class MapCard {
   }
 }
 
-/** The time of a sale and what was sold; leads to its recording, where there is one. */
-function saleRow({ id, moment, text, isSaved }: Footage): HTMLElement {
-  const told = `${minuteText(moment * 1000)} · ${text.replaceAll("\n", " · ")}`;
-  return element("li", { title: text }, isSaved ? element("a", { href: `#pos=${id}` }, told) : told);
+/** The time of a transaction and its text; leads to its recording, where there is one. */
+function transactionRow({ id, moment, text, isSaved }: Footage): HTMLElement {
+  const label = `${minuteText(moment * 1000)} · ${text.replaceAll("\n", " · ")}`;
+  return element("li", { title: text }, isSaved ? element("a", { href: `#pos=${id}` }, label) : label);
 }

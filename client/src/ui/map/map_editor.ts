@@ -42,7 +42,7 @@ export class MapEditor {
   readonly #conflict: HTMLElement;
   readonly #onKey = (event: KeyboardEvent) => this.#pressKey(event);
   readonly #onLeave = (event: BeforeUnloadEvent) => this.isChanged && event.preventDefault();
-  /** Of the map on the server that the changes are based on. */
+  /** The revision of the map on the server that the changes are based on. */
   #revision: number;
   /** The save under way; the next one builds on the revision that it makes. */
   #saving = Promise.resolve();

@@ -7,7 +7,7 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { titleOf } from "./map_item";
 
-/** Of one press of the button or key. */
+/** By one press of the button or key. */
 export const kTurnDegrees = 15;
 const kTextPositions = ["Below", "Above", "Left", "Right"];
 

@@ -56,7 +56,7 @@ export function parseEventsAddress(hash: string): EventsAddress | null {
   };
 }
 
-/** Of the recordings of one camera; where a time is given, they are played from there on. */
+/** The address of one camera's recordings; where a time is given, they are played from there on. */
 export function cameraAddress(camera: number, atMs: number | null): string {
   const stage = { plan: { layout: 1 as const, cells: [camera] }, large: null };
   return formatEventsAddress({ footage: null, atMs, isPlaying: atMs !== null, stage, filter: null });

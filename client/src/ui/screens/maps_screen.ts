@@ -264,7 +264,7 @@ export class MapsScreen extends Screen {
     this.#stage.prepend(this.#editor.root);
   }
 
-  /** False where the user would rather go on editing. */
+  /** False where the user would rather continue editing. */
   #leaveEditor(): boolean {
     if (!this.canLeave()) return false;
     this.#editor?.close();

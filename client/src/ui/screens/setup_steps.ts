@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Leads whoever has just made the first account through the settings: the first camera, then storage. Each can be
+// Leads the user who has just made the first account through the settings: the first camera, then storage. Each can be
 // skipped.
 
 import { element } from "../widgets/dom";
@@ -10,7 +10,7 @@ const kSteps = ["Account", "First camera", "Storage"] as const;
 
 export class SetupSteps {
   readonly root: HTMLElement;
-  // Of the others nobody knows whether they were done or skipped.
+  // Whether the others were done or skipped is not known.
   readonly #steps = kSteps.map((name, at) => element("li", { class: at === 0 ? "setup-step done" : "setup-step" }, name));
   readonly #next = element("a", { class: "button" });
 

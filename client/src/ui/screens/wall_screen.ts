@@ -72,7 +72,7 @@ export class WallScreen extends Screen {
     this.front.append(this.#tabs.root, this.#sequence.root, this.#advice, this.#message, this.#grid.root);
     this.root.append(this.#menu.root);
     this.#picker.show(arrangement.grid);
-    // Whoever touches a tile wants to see more of what is there.
+    // A user who touches a tile wants to see more of what is there.
     for (const type of ["pointerdown", "focusin"]) this.#grid.root.addEventListener(type, () => this.#pause());
     const loadUnlessHidden = () => void (document.hidden || this.#load());
     const followVisibility = () => {
@@ -113,7 +113,7 @@ export class WallScreen extends Screen {
       ["S", "Snapshot of the camera"],
       ["F", "Full screen"],
       ["L", "Saved layouts and sequences"],
-      ["Space", "Pause the sequence, or go on"],
+      ["Space", "Pause or continue the sequence"],
       ["P N", "The sequence's layout before or after"],
     ];
   }
@@ -273,7 +273,7 @@ export class WallScreen extends Screen {
   }
 }
 
-/** Of all that the account may see, those without signal; a group or a layout shows some of them. */
+/** All cameras without signal that the account may see; a group or a layout shows some of them. */
 function countText(shown: number, all: number, lost: number): string {
   const cameras = `${shown === all ? "" : `${shown} of `}${all} ${all === 1 ? "camera" : "cameras"}`;
   return lost > 0 ? `${cameras} · ${lost} without signal` : cameras;

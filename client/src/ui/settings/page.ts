@@ -66,7 +66,7 @@ export abstract class LoadedPage<Data> implements Page {
     return this.#closing.signal;
   }
 
-  /** Of a record, to the list that it is in. */
+  /** Leads from a record to the list that it is in. */
   protected linkBack(label: string, href: string): void {
     this.#heading.before(element("a", { class: "icon-button", href, "aria-label": label, title: label }, icon("back")));
   }

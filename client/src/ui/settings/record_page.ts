@@ -70,7 +70,7 @@ export abstract class RecordPage<
 
   protected abstract newFields(record: Stored | null, list: List): Fields;
 
-  /** Each setting in words, for whoever has to choose between two changes. */
+  /** Each setting in words, for a user who has to choose between two changes. */
   protected abstract descriptions(list: List): Descriptions<Settings>;
 
   /** Stores `settings`, made from `base`; null: the user has changed their mind. Rejects with a ServerError. */

@@ -24,7 +24,7 @@ export class SeenRecord<Stored extends Revised & { name: string }> {
       if (status !== 409 || typeof data !== "object" || data === null || !("revision" in data)) throw error;
       // What is no record of many has no name there.
       this.#record = { ...this.#record, ...(data as Stored) };
-      return `Someone else has changed ${this.#record.name} in the meantime. Press ${this.#submit} again to go on all the same.`;
+      return `Someone else has changed ${this.#record.name} in the meantime. Press ${this.#submit} again to save it anyway.`;
     }
   }
 }

@@ -42,9 +42,9 @@ const kMaxEventsSpanMs = 4 * 86_400_000;
 const kMarkPx = 6;
 const kKeyZoom = 1.6;
 const kStartSpanMs = 6 * 3_600_000;
-/** Of the span, kept free behind the playhead or the present. */
+/** The part of the span that is kept free behind the playhead or the present. */
 const kAhead = 0.12;
-/** Of the span, how much may be still to come. */
+/** The part of the span that may be still to come. */
 const kMaxAhead = 0.3;
 
 export class Timeline {
@@ -192,7 +192,7 @@ export class Timeline {
   }
 
   #show(scale: TimeScale): void {
-    // Of the future there is nothing to see.
+    // There is nothing to see of the future.
     const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMaxAhead);
     this.#scale = beyondMs > 0 ? scale.panned(beyondMs / scale.msPerPx) : scale;
     this.#actions.moved();

@@ -3,7 +3,7 @@
 // Paints the timeline: the axis, and for each camera a lane of coverage, events and marks.
 //
 // Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of
-//               the one before are left out, and each colour is filled once, so that dragging is smooth.
+//               the one before are skipped, and each colour is filled once, so that dragging is smooth.
 
 import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
 import { midnights } from "../../playback/recorded_days";

@@ -11,7 +11,7 @@ export interface AbsentCamera {
   readonly reason: string;
 }
 
-/** Of one account, since the page was loaded. */
+/** Those of one account, since the page was loaded. */
 export class AbsentCameras {
   #last: CameraList | null = null;
   #absent: AbsentCamera[] = [];

@@ -31,7 +31,7 @@ const kSteps: Record<string, (columns: number) => number> = {
   ArrowDown: (columns) => columns,
 };
 
-/** Which order the tiles have, and who is told that the user has changed it. */
+/** The order of the tiles, and what is called when the user has changed it. */
 export interface TileOrder {
   inOrder(cameras: readonly Camera[]): Camera[];
   /** `ids` are those of all tiles. */

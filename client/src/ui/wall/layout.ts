@@ -11,7 +11,7 @@ export interface Space {
   heightPx: number;
   /** Between tiles. */
   gapPx: number;
-  /** Of a tile's bar with name and state, below its picture. */
+  /** The height of a tile's bar with name and state, below its picture. */
   barPx: number;
 }
 
@@ -19,7 +19,7 @@ export interface Space {
 const kPhoneWidthPx = 640;
 const kMinTilePx = 240;
 const kPictureRatio = 16 / 9;
-/** Of the layout with one large camera; that one takes all columns but one, and as many rows. */
+/** For the layout with one large camera; that one takes all columns but one, and as many rows. */
 const kColumnsBesideFirst = 4;
 
 /** Columns and width of a tile; what does not fit on the screen is scrolled. */

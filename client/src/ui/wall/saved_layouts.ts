@@ -4,7 +4,7 @@
 //
 // Why so        Each is a record of its own among the account's preferences, so that of two tabs that save different
 //               ones neither loses any. A sequence names its layouts by ids, which stay when a layout gets another
-//               name; what is deleted is left out when the sequence is read.
+//               name; what is deleted is skipped when the sequence is read.
 // Invariants    Whatever the server sends, no getter throws, and all that they give is within the limits below. What is
 //               not, another version may have written: it is left alone.
 

@@ -32,7 +32,7 @@ export class SequenceRun {
 
   /**
    * Begins with `refresh`. `canShow` says whether the account may see any of a layout; `changed` is called whenever
-   * another layout is to be shown, or the sequence is paused or goes on.
+   * another layout is to be shown, or the sequence is paused or continues.
    */
   constructor(id: string, saved: SavedLayouts, canShow: (layout: SavedLayout) => boolean, changed: () => void) {
     this.id = id;
@@ -74,7 +74,7 @@ export class SequenceRun {
     this.#changed();
   }
 
-  /** Nobody sees the page: the sequence waits, and goes on later unless it is paused. */
+  /** Nobody sees the page: the sequence waits, and continues later unless it is paused. */
   set isHidden(isHidden: boolean) {
     this.#isHidden = isHidden;
     this.#wait();

@@ -95,7 +95,7 @@ export class WallMenu {
     if (layouts.length === 0) add.before(element("p", { class: "quiet" }, "A sequence shows saved layouts in turn."));
   }
 
-  /** Controls are made anew when what they are for has changed. */
+  /** Controls are made again when what they are for has changed. */
   #focus(): void {
     const controls = [...this.#content.querySelectorAll<HTMLElement>("[data-control]")];
     const named = (name: string) => controls.find((one) => one.dataset["control"] === name);

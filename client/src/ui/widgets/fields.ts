@@ -44,7 +44,7 @@ export function textField(label: string, attributes: Record<string, string | boo
   };
 }
 
-/** For a password. Browsers fill in none: who is at the page need not be who has logged in. */
+/** For a password. Browsers fill in none: the person at the page need not be the one who has logged in. */
 export function secretField(label: string, hint = ""): TextField {
   return textField(label, { type: "password", autocomplete: "new-password", maxlength: "1024" }, hint);
 }

@@ -2,13 +2,13 @@
 //
 // Whether a key belongs to the control that has the focus, or is free for the screen's shortcuts.
 //
-// Why so        A click leaves the focus on what was clicked. Whoever then presses Space means the picture, not the
-//               button once more; whoever came to the button with Tab means the button. A dialog gives the focus back to
-//               where it was, and that is then as it was.
+// Why so        A click leaves the focus on what was clicked. A user who then presses Space means the picture, not the
+//               button once more; one who came to the button with Tab means the button. A dialog gives the focus back
+//               to where it was, and whether a click or a key brought it there stays as it was.
 
 const kNoText = /^(checkbox|radio|button|submit|reset|range|color|file|image)$/;
-/** What works the controls that are no text fields. */
-const kWorking: Record<string, RegExp> = {
+/** The keys that operate the controls that are no text fields. */
+const kOperating: Record<string, RegExp> = {
   A: /^Enter$/,
   BUTTON: /^( |Enter)$/,
   SUMMARY: /^( |Enter)$/,
@@ -25,7 +25,7 @@ function noteInput(byPointer: boolean): void {
   wasInDialog = isInDialog(document.activeElement);
 }
 
-/** Firefox tells nothing of a focus that a dialog gives back. */
+/** Firefox sends no focusin where a dialog gives the focus back. */
 function noteFocus(focused: EventTarget): void {
   if (wasInDialog && !isInDialog(focused)) return;
   if (isPointerLast) focusedByPointer.add(focused);
@@ -48,5 +48,5 @@ export function hasFocusByPointer(): boolean {
 export function isForFocused({ target, key }: KeyboardEvent): boolean {
   if (!(target instanceof HTMLElement)) return false;
   const isText = target instanceof HTMLInputElement ? !kNoText.test(target.type) : target instanceof HTMLTextAreaElement;
-  return isText || (!focusedByPointer.has(target) && (kWorking[target.tagName]?.test(key) ?? false));
+  return isText || (!focusedByPointer.has(target) && (kOperating[target.tagName]?.test(key) ?? false));
 }

@@ -4,13 +4,13 @@
 
 let screen = "";
 
-/** Of a screen. */
+/** The title of a screen. */
 export function titleScreen(name: string): void {
   screen = name;
   titleCover(null);
 }
 
-/** Of what covers the screen; null: it is uncovered again. */
+/** The title of what covers the screen; null: it is uncovered again. */
 export function titleCover(name: string | null): void {
   document.title = `${name ?? screen} · Lookhaven`;
 }

@@ -153,7 +153,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await dialog.getByText("that of another certificate").waitFor();
     setup.offered = { ...certificate, fingerprint: "EF:01", selfSigned: false, pairedHosts: ["Watcher"] };
     await check.click();
-    await dialog.getByText("1 host is paired by the certificate from before and must be paired anew: Watcher.").waitFor();
+    await dialog.getByText("1 host is paired by the certificate from before and must be paired again: Watcher.").waitFor();
     await dialog.getByText("EF:01").waitFor();
     for (const [typed, told] of [["wrong", "your own password is wrong"], ["right", "The certificate is replaced."]] as const) {
       await dialog.getByLabel("Your own password").fill(typed);

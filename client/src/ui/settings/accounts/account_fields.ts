@@ -11,7 +11,7 @@ import { RightsMatrix } from "./rights_matrix";
 
 export type AccountSettings = UserSettings & { name: string };
 
-/** Whoever changed it here would end the own session. */
+/** Changing it here would end one's own session. */
 const kOwnHint = "Change your own password in the account menu in the bar.";
 const kStays = "Leave empty to keep it. A new password ends all sessions of this account.";
 

@@ -2,7 +2,7 @@
 //
 // One account: its privilege, password, rights and sessions.
 //
-// Why so        Who leaves a page open gives nobody an account: a new account, password or privilege, and a removal,
+// Why so        A page left open must give nobody an account: a new account, password or privilege, and a removal,
 //               take the manager's own password.
 
 import { Accounts, type UserList, type UserRecord } from "../../../wire/accounts";

@@ -70,7 +70,7 @@ export class SessionsPanel {
   async #endAll(count: number): Promise<void> {
     const isDone = await openDialog(this.#host, {
       title: `End ${counted(count, "session")}?`,
-      content: [element("p", {}, "Whoever uses them must log in again.")],
+      content: [element("p", {}, "Their users must log in again.")],
       submit: "End them",
       attempt: async () => {
         notify(`${counted(await this.#accounts.endSessions(this.#user), "session")} ended.`);

@@ -21,7 +21,7 @@ const kVerbs: Record<string, string> = {
   endSessions: "sessions ended",
   admit: "may show cameras of this one",
   invite: "invited by a code",
-  cameras: "cameras read anew",
+  cameras: "cameras read again",
 };
 
 /** "camera.add": "Camera added". */

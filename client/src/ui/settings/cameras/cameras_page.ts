@@ -17,7 +17,7 @@ import { CameraRow } from "./camera_row";
 const kStatesIntervalMs = 4_000;
 const kPicturesIntervalMs = 30_000;
 const kMaxConcurrentPictures = 2;
-/** Of several moves one after the other, the last is stored. */
+/** After several moves in quick succession only the last is stored. */
 const kOrderDelayMs = 500;
 
 export class CamerasPage extends LoadedPage<CameraSetupList> {

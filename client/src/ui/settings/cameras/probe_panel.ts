@@ -65,7 +65,7 @@ export class ProbePanel {
     }
   }
 
-  /** A camera may take a quarter of a minute: says that it goes on. */
+  /** A camera may take a quarter of a minute: says that it is still running. */
   #count(): () => void {
     const startMs = performance.now();
     const seconds = element("span", { "aria-hidden": "true" });

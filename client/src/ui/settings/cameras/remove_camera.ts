@@ -13,7 +13,7 @@ import { notify } from "../../widgets/notice";
 import { minuteText } from "../../widgets/text";
 
 /**
- * Whether it is removed. What it has is asked for anew, so that the user decides on what is there now; `pressed` is
+ * Whether it is removed. What it has is asked for again, so that the user decides on what is there now; `pressed` is
  * busy until that is known.
  */
 export async function askToRemove(

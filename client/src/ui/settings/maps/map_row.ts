@@ -23,7 +23,7 @@ export class MapRow {
   readonly #facts = element("p", { class: "quiet" });
   readonly #named: [control: HTMLElement, does: string][];
   #map: EmapRecord;
-  /** Of the picture that is shown. */
+  /** The address of the picture that is shown. */
   #url = "";
 
   constructor(map: EmapRecord, actions: MapRowActions) {
@@ -52,7 +52,7 @@ export class MapRow {
     return this.#map.id;
   }
 
-  /** Whether the picture has to be loaded anew. */
+  /** Whether the picture has to be loaded again. */
   show(map: EmapRecord): boolean {
     const isOther = map.picture !== this.#map.picture || this.#url === "";
     this.#map = map;

@@ -7,7 +7,7 @@
 import { kMaxUploadBytes } from "../../../wire/emap_setup";
 
 export const kPictureFiles = ".png,.jpg,.jpeg,.webp,.svg";
-/** Of the longer side of a drawing that is smaller, in pixels. */
+/** The longer side of a drawing that is smaller, in pixels. */
 const kDrawnSide = 2400;
 const kMaxDrawnSide = 5000;
 

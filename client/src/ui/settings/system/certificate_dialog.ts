@@ -53,6 +53,6 @@ export function sentences({ subject, name, end, fingerprint, selfSigned, pairedH
     `${subject}, for ${name.join(", ") || "no name that browsers look at"}, until ${calendarDate(end * 1000)}.`,
     `Fingerprint (SHA-256): ${fingerprint}`,
     selfSigned ? "It is self-signed: browsers will ask about it once." : "A browser that does not know its issuer will ask about it.",
-    ...(hosts ? [`${many} paired by the certificate from before and must be paired anew: ${hosts}.`] : []),
+    ...(hosts ? [`${many} paired by the certificate from before and must be paired again: ${hosts}.`] : []),
   ];
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The last errors that the server has logged, for whoever has no shell there; and where else to look.
+// The last errors that the server has logged, for users without a shell there; and where else to look.
 
 import type { LogTail, System } from "../../../wire/system";
 import { button } from "../../widgets/button";
