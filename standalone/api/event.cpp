@@ -20,6 +20,7 @@
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/outline.h"
 #include "standalone/store/settings.h"
 #include "standalone/store/users.h"
 
@@ -30,6 +31,8 @@ namespace {
 constexpr std::int64_t kMaxAheadSeconds = 300;  // a POS terminal's clock may be off
 constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
+constexpr int kMaxSteps = 20'000;
+constexpr std::int64_t kMaxStepSeconds = 86'400;
 constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
 
 // One text, or a list of lines.
@@ -168,6 +171,44 @@ std::string List(const Call& call) {
     return SuccessAnswer(data);
 }
 
+Json::Value MomentsOf(const std::vector<std::int64_t>& moments) {
+    Json::Value json(Json::arrayValue);
+    for (const std::int64_t moment_s : moments) {
+        json.append(Json::Int64{moment_s});
+    }
+    return json;
+}
+
+Json::Value BarsOf(const std::vector<store::Bar>& bars) {
+    Json::Value json(Json::arrayValue);
+    for (const store::Bar& bar : bars) {
+        json.append(MomentsOf({bar.start_s, bar.end_s}));
+    }
+    return json;
+}
+
+std::string Outline(const Call& call) {
+    const std::int64_t begin_s = call.NumberOr("from", 0);
+    const std::int64_t end_s = call.NumberOr("to", 0);
+    const std::int64_t step_s = call.NumberOr("step", 0);
+    if (begin_s < 0 || end_s <= begin_s || step_s < 1 || step_s > kMaxStepSeconds ||
+        (end_s - begin_s) / step_s > kMaxSteps) {
+        throw Failure(400, "from, to or step is out of its bounds");
+    }
+    Json::Value data;
+    data["camera"] = Json::arrayValue;
+    for (const int camera : CamerasOf(call)) {
+        const store::Outline outline = store::OutlineOf(call.Records(), camera, begin_s, end_s, step_s);
+        Json::Value& json = data["camera"].append(Json::objectValue);
+        json["camera_id"] = camera;
+        json["continuous"] = BarsOf(outline.continuous);
+        json["alarm"] = BarsOf(outline.alarm);
+        json["alert"] = MomentsOf(outline.alerts);
+        json["pos"] = MomentsOf(outline.transactions);
+    }
+    return SuccessAnswer(data);
+}
+
 // What the parameter "kinds" names, as a list; all when it is missing.
 struct Kinds {
     bool continuous = true;
@@ -234,6 +275,7 @@ std::string Next(const Call& call) {
 
 constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Accepts::kPostOnly},
                                {"List", List},
+                               {"Outline", Outline},
                                {"Watch", Watch},
                                {"Get", Get},
                                {"Next", Next},

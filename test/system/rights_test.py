@@ -63,6 +63,7 @@ Event.List text=coffee: event                                         E      E  
 Event.Watch after=0-now: event                                        E      E     D       O     D    D       D        D        D      D       E
 Event.Get event={event}                                               E      E     D/N     N     D/N  D/N     D/N      D/N      D/N    D/N     E
 Event.Get event={alert} kind=alert                                    E      E     D/N     N     D/N  D/N     D/N      D/N      D/N    D/N     E
+Event.Outline cameralists={camera} from=-1d to=now step=60: bar       E      E     D/O     O     D/O  D/O     D/O      D/O      D/O    D/O     E
 Event.Next cameralists={camera} time=-1d: event                       E      E     D/O     O     D/O  D/O     D/O      D/O      D/O    D/O     E
 Event.Frame event={event} time_ms=0                                   E      E     D/N     N     D/N  D/N     D/N      D/N      D/N    D/N     E
 POST Event.Keep event={event} note=x                                  E      E     F       F     F    F       F        F        F      D/N     E
@@ -160,6 +161,7 @@ TELLS = {
     ("States", "door"): lambda data: any(one["id"] == 2 for one in data["door"]),
     ("States", "camera"): lambda data: any(one["camera"] == 2 for one in data["io"]),
     ("Next", "event"): lambda data: data["event"] is not None and data["event"]["camera_id"] == 2,
+    ("Outline", "bar"): lambda data: any(one["camera_id"] == 2 and one["alarm"] + one["continuous"] for one in data["camera"]),
     ("List", "event"): lambda data: any(event["camera_id"] == 2 for event in data["event"]),
     ("LoadCamera", "camera"): lambda data: any(one["id"] == 2 for one in data["camera"]),
     ("SearchAvaiDate", "day"): lambda data: 1 in data["available_day"],

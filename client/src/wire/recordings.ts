@@ -26,6 +26,14 @@ export interface CameraHistory {
   coverage: { interval: number; runs: Runs } | null;
 }
 
+/** First and last second of what was recorded for that reason, and when alerts and POS transactions happened. */
+export interface LaneOutline {
+  continuous: readonly (readonly [startS: number, stopS: number])[];
+  alarm: readonly (readonly [startS: number, stopS: number])[];
+  alert: readonly number[];
+  pos: readonly number[];
+}
+
 export interface CameraGroup {
   id: number;
   name: string;
@@ -129,6 +137,13 @@ export class Recordings {
       cameralists: cameras.join(),
     });
     return (answer.available_day ?? []).map((day) => day === 1);
+  }
+
+  /** What there is in the span, no finer than `stepS`. */
+  async outline(fromS: number, toS: number, stepS: number, cameras: readonly number[]): Promise<(LaneOutline & { camera_id: number })[]> {
+    const span = { from: String(fromS), to: String(toS), step: String(stepS) };
+    const asked = { ...span, cameralists: cameras.join() };
+    return (await this.#server.call<{ camera: (LaneOutline & { camera_id: number })[] }>("VEXO.Event", "Outline", asked)).camera;
   }
 
   async marks(fromS: number, toS: number, cameras: readonly number[]): Promise<Footage[]> {

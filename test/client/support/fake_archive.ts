@@ -83,6 +83,8 @@ export class FakeArchive {
           return json({ event: this.recorded.filter(wanted).map((one) => ({ ...rawMark(one), found: found(one.text!) })) });
         }
         return json({ event: idsOf(query).flatMap((camera) => this.#overlapping(camera, number("from"), number("to"), true).map(rawMark)) });
+      case "VEXO.Event Outline":
+        return json({ camera: idsOf(query).map((camera) => this.#outline(camera, number("from"), number("to"))) });
       case "VEXO.Event Get": {
         const kind = query.get("kind") ?? "event";
         const one = this.recorded.find(({ id, kind: its = "event" }) => id === number("event") && its === kind);
@@ -172,6 +174,14 @@ export class FakeArchive {
       else runs.push([value, 1]);
     }
     return { camera_id: camera, event: events.map(rawEvent), event_map: { interval, runs }, total: events.length };
+  }
+
+  /** With each event by itself: nothing is joined. */
+  #outline(camera: number, from: number, to: number) {
+    const events = this.#overlapping(camera, from, to, false).sort((one, other) => one.start - other.start);
+    const bars = (isContinuous: boolean) => events.filter(({ reason = 1 }) => (reason === 1) === isContinuous).map(({ start, stop }) => [start, stop]);
+    const moments = (kind: string) => this.#overlapping(camera, from, to, true).filter((one) => one.kind === kind).map(({ start }) => start + 5);
+    return { camera_id: camera, continuous: bars(true), alarm: bars(false), alert: moments("alert"), pos: moments("pos") };
   }
 
   #days(query: URLSearchParams): number[] {

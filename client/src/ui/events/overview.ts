@@ -4,6 +4,7 @@
 // cache.
 
 import { FootageCache } from "../../playback/footage_cache";
+import { FootageOutline } from "../../playback/footage_outline";
 import { RecordedDays } from "../../playback/recorded_days";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
@@ -32,6 +33,7 @@ export interface OverviewActions extends Omit<TimelineActions, "stillAddress"> {
 
 export class Overview {
   readonly cache: FootageCache;
+  readonly outline: FootageOutline;
   readonly filter: EventFilter;
   readonly list: EventList;
   readonly timeline: Timeline;
@@ -50,6 +52,7 @@ export class Overview {
       this.#showFootage();
       actions.learned();
     });
+    this.outline = new FootageOutline(recordings, () => this.timeline.redraw());
     this.#days = new RecordedDays(recordings, () => this.#showDays());
     const scope = () => ({ cameras: this.#chosen, kinds: this.filter.kinds });
     this.#search = new TextSearch(recordings, scope, () => this.#showFootage());
@@ -60,7 +63,7 @@ export class Overview {
       actions,
     );
     const stillAddress = recordings.stillAddress.bind(recordings);
-    this.timeline = new Timeline(this.cache, this.#days, { ...actions, stillAddress, moved: () => this.#onMoved() });
+    this.timeline = new Timeline(this.cache, this.outline, { ...actions, stillAddress, moved: () => this.#onMoved() });
     this.calendar = new Calendar(this.#days, () => this.#chosen, (dayMs) => this.#pickDay(dayMs));
   }
 
@@ -118,8 +121,8 @@ export class Overview {
   /** Loads what the timeline shows now, and what has been recorded since. */
   reload(): void {
     if (document.hidden || this.#cameras.length === 0) return;
-    const { startMs, endMs } = this.timeline.scale;
-    if (!this.timeline.showsEvents) this.#days.load(this.#loaded, startMs, endMs);
+    const { startMs, endMs, msPerPx, widthPx } = this.timeline.scale;
+    if (!this.timeline.showsEvents) this.outline.load(this.#loaded, startMs, msPerPx, widthPx);
     else void this.cache.load(this.#loaded, startMs / 1000, endMs / 1000, true).then(() => this.#showFootage());
     // Asks again for days that the server did not answer for.
     this.calendar.refresh();

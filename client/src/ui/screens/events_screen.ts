@@ -208,10 +208,10 @@ export class EventsScreen extends Screen {
   #refresh(): void {
     this.#playback.tick();
     this.#address.record();
-    const { cache, cameras } = this.#overview;
-    const error = this.#error || cache.error;
+    const { cache, outline, cameras, timeline } = this.#overview;
+    const error = this.#error || (timeline.showsEvents ? cache : outline).error;
     const empty = cameras.length === 0 && this.progress.hidden ? "No cameras" : "";
-    this.progress.hidden = !cache.isBusy && (cameras.length > 0 || error !== "");
+    this.progress.hidden = !cache.isBusy && !outline.isBusy && (cameras.length > 0 || error !== "");
     setText(this.#status, error || empty);
     this.#status.classList.toggle("alarm", error !== "");
   }

@@ -5,16 +5,18 @@
 
 import { kindOf, type EventKind } from "../../playback/coverage";
 import type { FootageCache } from "../../playback/footage_cache";
-import { midnight, type RecordedDays } from "../../playback/recorded_days";
+import type { FootageOutline } from "../../playback/footage_outline";
+import { midnight } from "../../playback/recorded_days";
 import { describe, type Footage, type FootageRef } from "../../wire/footage";
 import { element } from "../widgets/dom";
 import { OncePerFrame } from "../widgets/once_per_frame";
 import { panZoomByWheel, PanZoomPointers, type PanZoomActions, type Point } from "../widgets/pan_zoom";
-import { clockTime, duration, shortDate } from "../widgets/text";
+import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
 import { SpanHandles, type Span } from "./span_handles";
 import { TimelineScrubber, type ScrubActions } from "./timeline_scrubber";
 import { TimeScale } from "./time_scale";
-import { coloursOf, kAxisPx, paintAxis, paintGrid, paintLane, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
+import { coloursOf, kAxisPx, paintAxis, paintGrid, paintPlayhead, prepare, type Colours } from "./timeline_drawing";
+import { chosenOf, paintLane, type LaneContent } from "./timeline_lane";
 import { kHintStillPx, TimelineHint } from "./timeline_hint";
 
 export interface Lane {
@@ -37,7 +39,7 @@ export interface TimelineActions extends ScrubActions {
   stillAddress(footage: Footage, atMs: number, widthPx: number): string;
 }
 
-/** Wider than this, single events are neither fetched nor drawn, but the days that have any. */
+/** Of more than this an outline is fetched and drawn, instead of each event. */
 const kMaxEventsSpanMs = 4 * 86_400_000;
 const kMarkPx = 6;
 const kKeyZoom = 1.6;
@@ -50,7 +52,7 @@ const kMaxAhead = 0.3;
 export class Timeline {
   readonly root: HTMLElement;
   readonly #cache: FootageCache;
-  readonly #days: RecordedDays;
+  readonly #outline: FootageOutline;
   readonly #actions: TimelineActions;
   readonly #axis = element("canvas", { class: "timeline-axis", "aria-hidden": "true" });
   readonly #canvas = element("canvas", {
@@ -79,9 +81,9 @@ export class Timeline {
   #playheadMs: number | null = null;
   #selected: FootageRef | null = null;
 
-  constructor(cache: FootageCache, days: RecordedDays, actions: TimelineActions) {
+  constructor(cache: FootageCache, outline: FootageOutline, actions: TimelineActions) {
     this.#cache = cache;
-    this.#days = days;
+    this.#outline = outline;
     this.#actions = actions;
     const scrolled = element("div", { class: "timeline-scroll" }, this.#names, this.#drawn);
     const head = element("div", { class: "timeline-head" }, element("div", { class: "timeline-corner" }), this.#axis);
@@ -115,7 +117,7 @@ export class Timeline {
     return this.#scale;
   }
 
-  /** Whether single events are shown, or only the days that have any. */
+  /** Whether each event is known, or only an outline. */
   get showsEvents(): boolean {
     return this.#scale.spanMs <= kMaxEventsSpanMs;
   }
@@ -226,11 +228,7 @@ export class Timeline {
     paintGrid(context, scale, colours, heightPx, Date.now());
     context.font = font;
     this.#lanes.forEach(({ camera }, index) => {
-      const content = {
-        ...this.#contentOf(camera),
-        hasDay: this.showsEvents ? null : (day: number) => this.#days.has(camera, day),
-      };
-      paintLane(context, scale, colours, content, index * lanePx, lanePx, this.#selected);
+      paintLane(context, scale, colours, this.#contentOf(camera), index * lanePx, lanePx, this.#selected);
     });
     // What was recorded there may have come to be known just now.
     if (this.#hint.withoutStill) this.#showHint(this.#hint.withoutStill);
@@ -240,10 +238,14 @@ export class Timeline {
     paintPlayhead(axis, x, kAxisPx, colours);
   }
 
-  #contentOf(camera: number) {
-    if (!this.showsEvents) return { footage: [], segments: [] };
-    const { footage, segments } = this.#cache.get(camera, this.#scale.startMs / 1000, this.#scale.endMs / 1000);
-    return { segments, footage: footage.filter((one) => this.#kinds.has(kindOf(one))) };
+  /** Events, or the outline; both while the right one is being fetched, so that what is known stays in sight. */
+  #contentOf(camera: number): LaneContent {
+    const { startMs, endMs } = this.#scale;
+    const lane = !this.showsEvents || this.#cache.isBusy ? this.#outline.get(camera) : null;
+    const outline = lane && chosenOf(lane, this.#kinds);
+    if (!this.showsEvents && this.#outline.covers(camera, startMs, endMs)) return { footage: [], segments: [], outline };
+    const { footage, segments } = this.#cache.get(camera, startMs / 1000, endMs / 1000);
+    return { segments, footage: footage.filter((one) => this.#kinds.has(kindOf(one))), outline };
   }
 
   #click(event: MouseEvent): void {
@@ -275,7 +277,7 @@ export class Timeline {
     const { event, mark } = this.#footageAt(camera, x);
     const about = mark ? describe(mark) : event ? `${duration(event.stop - event.start)} recorded` : "";
     const still = event?.isSaved ? this.#actions.stillAddress(event, atMs, kHintStillPx) : "";
-    this.#hint.show(point, `${this.showsEvents ? clockTime(atMs) : shortDate(atMs)}${about ? `\n${about}` : ""}`, still);
+    this.#hint.show(point, `${this.showsEvents ? clockTime(atMs) : minuteText(atMs)}${about ? `\n${about}` : ""}`, still);
   }
 
   #pressKey(event: KeyboardEvent): void {

@@ -1,0 +1,174 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Paints a camera's lane of the timeline: coverage, events and marks.
+//
+// Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of
+//               the one before are skipped, and each colour is filled once, so that dragging is smooth.
+
+import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
+import type { Footage, FootageKind, FootageRef } from "../../wire/footage";
+import type { LaneOutline } from "../../wire/recordings";
+import type { TimeScale } from "./time_scale";
+import type { Colours } from "./timeline_drawing";
+
+/** What is drawn in a lane. */
+export interface LaneContent {
+  /** By start; of the kinds that are shown. */
+  footage: readonly Footage[];
+  segments: readonly Segment[];
+  outline: LaneOutline | null;
+}
+
+export function chosenOf(outline: LaneOutline, kinds: ReadonlySet<EventKind>): LaneOutline {
+  const only = <T>(kind: EventKind, all: readonly T[]) => (kinds.has(kind) ? all : []);
+  const { continuous, alarm, alert, pos } = outline;
+  return {
+    continuous: only("continuous", continuous),
+    alarm: only("alarm", alarm),
+    alert: only("alert", alert),
+    pos: only("pos", pos),
+  };
+}
+
+/** Each at least 3 : 1 on the page, and told from the one before. */
+const kRecorded = "#5a6672";
+const kContinuous = "#7b8896";
+const kSelected = "#c3ced8";
+/** An event that is as wide is told from its neighbours. */
+const kMinSinglePx = 2;
+
+export function paintLane(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  colours: Colours,
+  lane: LaneContent,
+  topPx: number,
+  heightPx: number,
+  selected: FootageRef | null,
+): void {
+  const barTop = topPx + Math.round(heightPx * 0.3);
+  const barPx = Math.round(heightPx * 0.42);
+  if (lane.outline) paintOutline(context, scale, colours, lane.outline, topPx, barTop, barPx);
+  const strip = (segment: Segment) => [segment.startS, segment.stopS] as const;
+  paintBars(context, scale, lane.segments.map(strip), barTop, barPx, kRecorded);
+  const shown = overlapping(lane.footage, scale.startMs / 1000, scale.endMs / 1000);
+  const marks = shown.filter(({ kind }) => kind !== "event");
+  const bars = (kind: EventKind) => shown.filter((one) => kindOf(one) === kind).map((one) => [one.start, one.stop] as const);
+  paintBars(context, scale, bars("continuous"), barTop, barPx, kContinuous);
+  const chosen = shown.find((one) => one.kind === selected?.kind && one.id === selected.id);
+  if (chosen) paintBars(context, scale, [[chosen.start, chosen.stop]], barTop, barPx, kSelected);
+  paintBars(context, scale, bars("alarm"), barTop, barPx, colours.accent);
+  paintGrowing(context, scale, shown, barTop, barPx, colours);
+  for (const mark of marks) paintMark(context, scale, mark, topPx, barTop, colours, mark.id === selected?.id);
+  paintTexts(context, scale, marks, topPx, colours);
+}
+
+function paintOutline(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  colours: Colours,
+  { continuous, alarm, alert, pos }: LaneOutline,
+  topPx: number,
+  barTop: number,
+  barPx: number,
+): void {
+  paintBars(context, scale, continuous, barTop, barPx, kContinuous);
+  paintBars(context, scale, alarm, barTop, barPx, colours.accent);
+  for (const [kind, moments] of [["alert", alert], ["pos", pos]] as const) {
+    context.fillStyle = kind === "alert" ? colours.accent : colours.text;
+    for (const momentS of moments) {
+      if (scale.contains(momentS * 1000)) paintSign(context, kind, Math.round(scale.xOf(momentS * 1000)), topPx, barTop);
+    }
+  }
+}
+
+function paintBars(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  spans: readonly (readonly [startS: number, stopS: number])[],
+  topPx: number,
+  heightPx: number,
+  colour: string,
+): void {
+  context.fillStyle = colour;
+  context.beginPath();
+  let paintedPx = -1;
+  for (const [startS, stopS] of spans) {
+    const from = Math.max(-2, scale.xOf(startS * 1000));
+    const to = Math.min(scale.widthPx + 2, scale.xOf(stopS * 1000));
+    if (to < 0 || from > scale.widthPx || to <= paintedPx) continue;
+    // A hairline between two recordings, where there is room for one.
+    const gap = to - from >= kMinSinglePx ? Math.min(1, (to - from) / 4) : 0;
+    const left = Math.max(from, paintedPx);
+    const right = Math.max(to - gap, left + 1);
+    context.rect(left, topPx, right - left, heightPx);
+    paintedPx = right + gap;
+  }
+  context.fill();
+}
+
+/** What is still being recorded has an open end. */
+function paintGrowing(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  events: readonly Footage[],
+  topPx: number,
+  heightPx: number,
+  colours: Colours,
+): void {
+  for (const event of events.filter(({ isGrowing }) => isGrowing)) {
+    context.fillStyle = colours.text;
+    context.fillRect(Math.round(scale.xOf(event.stop * 1000)) - 1, topPx - 2, 2, heightPx + 4);
+  }
+}
+
+/** An alert is a triangle in the accent colour, a POS transaction a square; both stand above their time. */
+function paintMark(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  mark: Footage,
+  topPx: number,
+  barTop: number,
+  colours: Colours,
+  isSelected: boolean,
+): void {
+  const x = Math.round(scale.xOf(mark.moment * 1000));
+  const [from, to] = [scale.xOf(mark.start * 1000), scale.xOf(mark.stop * 1000)];
+  context.fillStyle = mark.kind === "alert" ? colours.accent : colours.text;
+  context.fillRect(from, barTop - 3, Math.max(1, to - from), isSelected ? 3 : 1);
+  paintSign(context, mark.kind, x, topPx, barTop);
+}
+
+function paintSign(context: CanvasRenderingContext2D, kind: FootageKind, x: number, topPx: number, barTop: number): void {
+  context.beginPath();
+  if (kind === "alert") {
+    context.moveTo(x - 4, topPx + 1.5);
+    context.lineTo(x + 4, topPx + 1.5);
+    context.lineTo(x, barTop - 2);
+  } else context.rect(x - 3, topPx + 2, 6, 6);
+  context.fill();
+}
+
+function paintTexts(
+  context: CanvasRenderingContext2D,
+  scale: TimeScale,
+  marks: readonly Footage[],
+  topPx: number,
+  colours: Colours,
+): void {
+  context.textBaseline = "top";
+  context.fillStyle = colours.quiet;
+  marks.forEach((mark, index) => {
+    const x = scale.xOf(mark.moment * 1000) + 7;
+    const nextX = marks[index + 1] ? scale.xOf(marks[index + 1]!.moment * 1000) - 6 : scale.widthPx;
+    const text = fitting(context, mark.text.split("\n")[0]!, nextX - x);
+    if (text) context.fillText(text, x, topPx);
+  });
+}
+
+function fitting(context: CanvasRenderingContext2D, text: string, roomPx: number): string {
+  if (roomPx < 40) return "";
+  if (context.measureText(text).width <= roomPx) return text;
+  const letters = Math.floor((text.length * roomPx) / context.measureText(text).width) - 1;
+  return letters > 2 ? `${text.slice(0, letters)}…` : "";
+}
