@@ -16,6 +16,7 @@
 #include "standalone/api/stream.h"
 #include "standalone/api/watch.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/moment.h"
 #include "standalone/binding/rights.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
@@ -69,6 +70,19 @@ store::Reporter RequireReporter(const Call& call) {
     return {user->id, user->name};
 }
 
+// When it happened: seconds, or a date and time that say their zone.
+std::int64_t StartOf(const Call& call, std::int64_t now_s) {
+    const Json::Value& start = call.Parameter("start");
+    if (!start.isString()) {
+        return call.NumberOr("start", now_s);
+    }
+    const std::optional<base::Moment> moment = base::ParseMoment(start.asString());
+    if (!moment || !moment->has_zone) {
+        throw Failure(400, "start must be seconds or look like 2026-03-01T08:15:30Z or 2026-03-01T09:15:30+01:00");
+    }
+    return moment->utc_s;
+}
+
 // What is reported is evidence: of a time of which there may be footage.
 void RequirePlausible(const Call& call, int camera, std::int64_t start_s, std::int64_t now_s) {
     if (start_s > now_s + kMaxAheadSeconds) {
@@ -88,7 +102,7 @@ std::string MarkIt(const Call& call) {
     }
     const int camera = static_cast<int>(call.Parameter("camera").asInt());
     const std::int64_t now_s = base::WallSeconds();
-    const std::int64_t start_s = call.NumberOr("start", now_s);
+    const std::int64_t start_s = StartOf(call, now_s);
     const std::int64_t length_s = call.NumberOr("length", 0);
     if (camera < 1 || start_s < 1 || length_s < 0 || length_s > store::kMaxMarkSeconds) {
         throw Failure(400, "camera, start or length is out of its bounds");

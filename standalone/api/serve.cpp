@@ -76,6 +76,9 @@ Call ReadCall(const Service& service, http::Request& request, control::SlotTable
               .slot = slot,
               .counters = service.counters};
     call.login = FindLogin(call);
+    if (call.login) {
+        base::SetLogAccount(call.login->account);
+    }
     const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
     if (!call.login && body_bytes > http::kMaxBodyWithoutSession) {
         throw SessionNeeded(call.Parameter("api") == kAuthApi.name);
@@ -94,6 +97,9 @@ Call ReadCall(const Service& service, http::Request& request, control::SlotTable
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
     call.method = call.Parameter("method").asString();
+    if (const Json::Value& camera = call.Parameter("camera"); camera.isInt()) {
+        base::SetLogCamera(camera.asInt());
+    }
     return call;
 }
 

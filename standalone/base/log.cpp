@@ -11,6 +11,7 @@
 #include <unistd.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/journal.h"
 
 namespace lookhaven::base {
 
@@ -19,7 +20,28 @@ namespace {
 std::atomic<const char*> g_program{"lookhaven"};
 std::atomic<Severity> g_threshold{Severity::kInfo};
 
-constexpr std::array<const char*, 4> kSeverityNames{"error", "warning", "info", "debug"};
+thread_local int t_camera = 0;
+thread_local std::string t_account;
+
+struct SeverityForm {
+    const char* name;
+    int priority;  // of syslog
+};
+constexpr std::array<SeverityForm, 4> kSeverities{{{"error", 3}, {"warning", 4}, {"info", 6}, {"debug", 7}}};
+
+// A line stays one line, and nothing in it controls the terminal that shows it, by a control character of ASCII or,
+// in UTF-8, of those from U+0080 to U+009F.
+std::string OneLine(std::string_view text) {
+    std::string line(text.substr(0, text.find_last_not_of("\r\n") + 1));
+    std::replace_if(
+        line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7f; }, ' ');
+    for (std::size_t at = line.find('\xc2'); at < line.size() - 1; at = line.find('\xc2', at + 1)) {
+        if (static_cast<unsigned char>(line[at + 1]) < 0xa0) {
+            line.replace(at, 2, 2, ' ');
+        }
+    }
+    return line;
+}
 
 }  // namespace
 
@@ -31,23 +53,25 @@ void SetLogThreshold(Severity threshold) {
     g_threshold = threshold;
 }
 
+void SetLogCamera(int camera) {
+    t_camera = camera;
+}
+
+void SetLogAccount(std::string_view account) {
+    t_account = OneLine(account);
+}
+
 void Log(Severity severity, std::string_view text) noexcept try {
     if (severity > g_threshold.load()) {
         return;
     }
-    std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
-                       kSeverityNames[static_cast<std::size_t>(severity)] + ": ";
-    line += text.substr(0, text.find_last_not_of("\r\n") + 1);
-    // A line stays one line, and nothing in it controls the terminal that shows it, by a control character of ASCII or,
-    // in UTF-8, of those from U+0080 to U+009F.
-    std::replace_if(
-        line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7f; }, ' ');
-    for (std::size_t at = line.find('\xc2'); at < line.size() - 1; at = line.find('\xc2', at + 1)) {
-        if (static_cast<unsigned char>(line[at + 1]) < 0xa0) {
-            line.replace(at, 2, 2, ' ');
-        }
+    const SeverityForm& form = kSeverities[static_cast<std::size_t>(severity)];
+    const std::string message = OneLine(text);
+    if (LogsToJournal() && SendToJournal({form.priority, g_program.load(), message, t_camera, t_account})) {
+        return;
     }
-    line += '\n';
+    const std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
+                             form.name + ": " + message + '\n';
     // A log that cannot be written has nobody to tell.
     [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
 } catch (...) {

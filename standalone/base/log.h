@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Log lines on standard error, one write each, so that lines of several processes do not interleave.
+// Log lines on standard error, one write each, so that lines of several processes do not interleave; entries with
+// fields where standard error is systemd's journal.
 #pragma once
 
 #include <string_view>
@@ -14,6 +15,10 @@ void SetLogProgram(const char* program);
 
 // Lines less severe than this are dropped. kInfo at start.
 void SetLogThreshold(Severity threshold);
+
+// What the lines of this thread are about from now on, for the journal; 0 and empty: nothing.
+void SetLogCamera(int camera);
+void SetLogAccount(std::string_view account);
 
 // Writes "2026-03-01T08:15:30.123Z recorder[812] error: text". Line breaks inside text become spaces. Never throws.
 //

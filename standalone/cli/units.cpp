@@ -2,8 +2,8 @@
 #include "standalone/cli/units.h"
 
 #include <cmath>
-#include <ctime>
 
+#include "standalone/base/moment.h"
 #include "standalone/cli/console.h"
 
 namespace lookhaven::cli {
@@ -16,27 +16,6 @@ template <typename Number>
 std::optional<Number> ParseQuantity(std::string_view text) {
     const auto number = ParseNumber<Number>(text);
     return number && *number >= 0 && *number <= static_cast<Number>(kMaxNumber) ? number : std::nullopt;
-}
-
-// UTC seconds of a date and time; nothing for one that the calendar does not have.
-std::optional<std::int64_t> ParseDate(std::string text) {
-    const bool utc = !text.empty() && text.back() == 'Z';
-    if (utc) {
-        text.pop_back();
-    }
-    for (const char* form :
-         {"%Y-%m-%dT%H:%M:%S", "%Y-%m-%d %H:%M:%S", "%Y-%m-%dT%H:%M", "%Y-%m-%d %H:%M", "%Y-%m-%d"}) {
-        std::tm time{};
-        const char* rest = ::strptime(text.c_str(), form, &time);
-        if (rest == nullptr || *rest != '\0') {
-            continue;
-        }
-        time.tm_isdst = -1;
-        const int day = time.tm_mday;
-        const std::int64_t moment = utc ? ::timegm(&time) : ::mktime(&time);
-        return time.tm_mday == day ? std::optional(moment) : std::nullopt;
-    }
-    return std::nullopt;
 }
 
 }  // namespace
@@ -74,11 +53,11 @@ std::int64_t ParseMoment(const std::string& text, std::int64_t now_s) {
     if (const auto seconds = ParseQuantity<std::int64_t>(text)) {
         return *seconds;
     }
-    const std::optional<std::int64_t> date = ParseDate(text);
-    if (!date || *date < 0) {
+    const std::optional<base::Moment> date = base::ParseMoment(text);
+    if (!date || date->utc_s < 0) {
         throw Failure(kUsage, "a time looks like 2026-03-01 08:15, 2026-03-01T08:15:30Z, -2h or now");
     }
-    return *date;
+    return date->utc_s;
 }
 
 }  // namespace lookhaven::cli

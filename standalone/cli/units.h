@@ -25,8 +25,8 @@ std::optional<Number> ParseNumber(std::string_view text) {
     return error == std::errc() && rest == text.data() + text.size() ? std::optional(number) : std::nullopt;
 }
 
-// "now"; "-2h" before now; seconds since the epoch; "2026-03-01", "2026-03-01 08:15" or "2026-03-01T08:15:30" in the
-// host's time zone, in UTC with a "Z" behind. UTC seconds. These three throw Failure for another form.
+// "now"; "-2h" before now; seconds since the epoch; a date and time of base/moment.h. UTC seconds. These three throw
+// Failure for another form.
 std::int64_t ParseMoment(const std::string& text, std::int64_t now_s);
 // "90s", "15m", "2h", "30d", "0": seconds.
 std::int64_t ParseDuration(const std::string& text);

@@ -43,6 +43,7 @@ maintenance::RecordingStatus RecordingWorker::State() const {
 }
 
 void RecordingWorker::Run(const std::stop_token& stop) {
+    base::SetLogCamera(camera_);
     {
         const std::stop_callback wake(stop, [this] { queue_->Wake(); });
         CameraRecorder recording(camera_, context_);

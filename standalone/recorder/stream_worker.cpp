@@ -64,6 +64,7 @@ void StreamWorker::Count(const media::Packet& packet) {
 }
 
 void StreamWorker::Run(const std::stop_token& stop) {
+    base::SetLogCamera(stream_.camera);
     {
         StreamRings rings(installation_, stream_);
         while (!stop.stop_requested()) {

@@ -28,8 +28,10 @@ TEST_F(EventApi, MarksAndListsWhatHappened) {
     EXPECT_EQ(transaction["state"], "pending");
     EXPECT_LE(transaction["start"].asInt(), 1000000);
     EXPECT_GE(transaction["stop"].asInt(), 1000020);
-    const Answer lines = host_.Ask("api=VEXO." + mark, admin_, {{"CONTENT_TYPE", "application/json"}},
-                                   R"({"kind": "alert", "camera": 2, "start": 2000000, "text": ["door", "opened"]})");
+    const Answer lines = host_.Ask(
+        "api=VEXO." + mark, admin_, {{"CONTENT_TYPE", "application/json"}},
+        R"({"kind": "alert", "camera": 2, "start": "1970-01-24T04:33:20+01:00", "text": ["door", "opened"]})");
+    EXPECT_EQ(lines.Json()["data"]["time"], 2'000'000);
     EXPECT_EQ(lines.Json()["data"]["text"][1], "opened");
     settings.Set("marks_per_day", "1");
     EXPECT_EQ(Ask(mark, "kind=alert&camera=1").status, 429) << "this account's share of the day";
@@ -88,6 +90,8 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=-9223372036854775808", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=" + late, 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&start=" + early, 400},  // before there was footage
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=2026-03-01T08:15:30", 400},        // of which zone?
+        {"Event&version=1&method=Mark", "kind=pos&camera=1&start=2026-03-01T08:15:30+01:00", 400},  // %2B is meant
         {"Event&version=1&method=Mark", "kind=pos&camera=1&length=-1", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&length=3601", 400},
         {"Event&version=1&method=Mark", "kind=pos&camera=1&text=a%07b", 400},

@@ -23,7 +23,9 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/base/journal.h"
 #include "standalone/base/log.h"
+#include "standalone/base/moment.h"
 #include "standalone/base/process.h"
 #include "standalone/base/service_manager.h"
 #include "test/support/folder.h"
@@ -202,6 +204,69 @@ TEST(LogTest, TheJournalIsKnownByStandardErrorItself) {
         EXPECT_EQ(LogsToJournal(), is_journal) << stream;
     }
     ::unsetenv("JOURNAL_STREAM");
+}
+
+TEST_F(FileTest, TheJournalGetsFieldsOfWhatThereIs) {
+    const std::string path = path_ / "socket";
+    const JournalEntry camera{3, "recorder", "camera 5: no signal", 5};
+    const JournalEntry account{6, "request", "=\xc3\xa4", 0, "J\xc3\xb6rg @ home"};
+    EXPECT_FALSE(SendToJournal(camera, path.c_str())) << "nobody listens";
+    const FileDescriptor journal(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+    sockaddr_un address{.sun_family = AF_UNIX, .sun_path = {}};
+    path.copy(address.sun_path, sizeof address.sun_path - 1);
+    ASSERT_EQ(::bind(journal.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+    EXPECT_TRUE(SendToJournal(camera, path.c_str()));
+    EXPECT_TRUE(SendToJournal(account, path.c_str()));
+    for (const char* expected :
+         {"MESSAGE=camera 5: no signal\nPRIORITY=3\nSYSLOG_IDENTIFIER=lookhaven-recorder\nLOOKHAVEN_CAMERA=5\n",
+          "MESSAGE==\xc3\xa4\nPRIORITY=6\nSYSLOG_IDENTIFIER=lookhaven-request\n"
+          "LOOKHAVEN_ACCOUNT=J\xc3\xb6rg @ home\n"}) {
+        std::array<char, 512> datagram{};
+        const ssize_t size = ::recv(journal.Get(), datagram.data(), datagram.size(), MSG_DONTWAIT);
+        EXPECT_EQ(std::string(datagram.data(), static_cast<std::size_t>(std::max<ssize_t>(size, 0))), expected);
+    }
+    while (SendToJournal(camera, path.c_str())) {  // until its queue is full: a log must not wait for it
+    }
+}
+
+TEST(MomentTest, IsoTimesSayTheirZoneOrAreTheHosts) {
+    ::setenv("TZ", "UTC-2", 1);  // two hours ahead
+    ::tzset();
+    constexpr std::int64_t kMorning = 1'772'352'900;  // 2026-03-01T08:15:00Z
+    const struct {
+        const char* text;
+        std::int64_t utc_s;  // -1: refused
+        bool has_zone = true;
+    } rows[] = {
+        {"2026-03-01T08:15:00Z", kMorning},
+        {"2026-03-01 08:15Z", kMorning},
+        {"2026-03-01T08:15:30.999Z", kMorning + 30},
+        {"2026-03-01T09:15:00+01:00", kMorning},
+        {"2026-03-01T04:45-0330", kMorning},
+        {"2026-03-01T10:15:00,5", kMorning, false},
+        {"2026-03-01 10:15", kMorning, false},
+        {"2026-03-01", kMorning - 10 * 3600 - 900, false},
+        {"2026-03-01Z", kMorning - 8 * 3600 - 900},
+        {"2026-02-30T08:15:00Z", -1},
+        {"2026-03-01T08:15:00 01:00", -1},
+        {"2026-03-01T08:15:00+1:00", -1},
+        {"2026-03-01T08:15:00+01:0", -1},
+        {"2026-03-01T08:15:00+01:00Z", -1},
+        {"2026-03-01T08:15.5Z", -1},
+        {"2026-03-01T08:15:30.Z", -1},
+        {"2026-03-01T08:15:30.2.5Z", -1},
+        {"08:15", -1},
+        {"+01:00", -1},
+        {"Z", -1},
+        {"", -1},
+    };
+    for (const auto& row : rows) {
+        const std::optional<Moment> moment = ParseMoment(row.text);
+        EXPECT_EQ(moment ? moment->utc_s : -1, row.utc_s) << row.text;
+        EXPECT_TRUE(!moment || moment->has_zone == row.has_zone) << row.text;
+    }
+    ::unsetenv("TZ");
+    ::tzset();
 }
 
 TEST(ClockTest, ABootHasOneIdWhoeverTellsIt) {
