@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// lookhaven event: lists, shows, keeps, marks and exports what was recorded.
+// lookhaven event: lists, shows, keeps, marks, exports and removes what was recorded.
 #include <filesystem>
 #include <optional>
 #include <set>
@@ -8,9 +8,11 @@
 #include <unistd.h>
 
 #include "standalone/admin/kept_events.h"
+#include "standalone/admin/removed_events.h"
 #include "standalone/base/clock.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/event_lookup.h"
 #include "standalone/cli/event_text.h"
 #include "standalone/cli/new_file.h"
 #include "standalone/cli/units.h"
@@ -30,7 +32,6 @@ using store::Events;
 using store::Mark;
 using store::MarkKind;
 using store::Marks;
-using store::MarkState;
 
 const Names<int> kKinds = {{"recorded", 0}, {"alert", 1}, {"pos", 2}};
 const Names<int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", base::kReasonAlarm}};
@@ -39,6 +40,7 @@ struct Request {
     int id = 0;
     std::string file;
     bool no_sound = false;
+    bool footage = false;
     std::string note;
     bool kept = false;
     std::vector<int> cameras;
@@ -113,33 +115,6 @@ void List(const Console& console, const Request& request) {
     console.Answer(data, data.empty() ? "There is no such event." : recorded ? EventTable(data) : MarkTable(data));
 }
 
-// An event or a mark: their ids come from one counter.
-struct Found {
-    std::optional<Event> event;
-    std::optional<Mark> mark;
-};
-
-Found RequireEvent(store::Store& store, int id) {
-    Found found{Events(store).Find(id), std::nullopt};
-    for (const auto& [name, kind] : store::MarkKindNames()) {
-        found.mark = found.event || found.mark ? found.mark : Marks(store).Find(kind, id);
-    }
-    if (!found.event && !found.mark) {
-        throw Failure(kNoInput, "there is no event ", id, ": see lookhaven event list");
-    }
-    return found;
-}
-
-// Empty when there is no file.
-std::filesystem::path FileOf(store::Store& store, const Found& found) {
-    const int mount_id = found.event ? found.event->mount_id : found.mark->mount_id;
-    const std::string& path = found.event ? found.event->path : found.mark->path;
-    const bool has_file =
-        found.event ? !found.event->demo : found.mark->state == MarkState::kSaved && !found.mark->demo;
-    const auto mount = store::Mounts(store).Find(mount_id);
-    return has_file && mount ? std::filesystem::path(mount->path) / path : std::filesystem::path();
-}
-
 void Show(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     const Found found = RequireEvent(store, request.id);
@@ -166,7 +141,7 @@ void ChangeKeeping(const Console& console, const Request& request, const auto& c
     store::Store store = console.OpenStore();
     const Found found = RequireEvent(store, request.id);
     std::vector<int> ids;
-    for (const Event& event : found.event ? std::vector{*found.event} : store::RecordingsOf(store, *found.mark)) {
+    for (const Event& event : RecordingsOf(store, found)) {
         ids.push_back(event.id);
     }
     if (change(store, ids) == 0) {
@@ -189,6 +164,18 @@ void Release(const Console& console, const Request& request) {
     ChangeKeeping(console, request, release, " is no longer kept.");
 }
 
+void Remove(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    const Found found = RequireEvent(store, request.id);
+    std::vector<Event> recordings;
+    if (found.event || request.footage) {
+        recordings = RecordingsOf(store, found);
+    }
+    admin::RemoveEvents(store, {}, recordings, found.mark);
+    console.Answer(Object("id", request.id, "recordings", static_cast<int>(recordings.size())), "Event ", request.id,
+                   " was removed", recordings.empty() ? "." : "; the recorder deletes its footage from the disk.");
+}
+
 void AddMark(const Console& console, const Request& request) {
     const std::int64_t moment = ParseMoment(request.at, base::WallSeconds());
     std::string text;
@@ -205,7 +192,7 @@ void AddMark(const Console& console, const Request& request) {
 
 std::filesystem::path RequireFile(store::Store& store, const Request& request) {
     const Found found = RequireEvent(store, request.id);
-    if (found.mark && found.mark->state == MarkState::kPending && !found.mark->demo) {
+    if (found.mark && found.mark->state == store::MarkState::kPending && !found.mark->demo) {
         throw Failure(kUnavailable, "the footage of event ", request.id,
                       " is not complete yet: try again after its end");
     }
@@ -272,6 +259,9 @@ void AddEvent(CLI::App& program, const Console& console) {
         .Option("id", request.id, id, Required)
         .Option("--note", request.note, "Why it is kept");
     group.Add("release", "Releases a kept event", Release).Option("id", request.id, id, Required);
+    group.Add("remove", "Deletes a recorded event, or an alert or POS transaction with its text", Remove)
+        .Option("id", request.id, id, Required)
+        .Flag("--footage", request.footage, "Of an alert or POS transaction: also the recordings of its footage");
     group.Add("mark", "Reports an alert or POS transaction with its footage", AddMark)
         .Option("camera", request.camera, "The camera's id", Required)
         .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(store::MarkKindNames()))

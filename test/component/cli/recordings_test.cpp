@@ -147,6 +147,34 @@ TEST_F(RecordingsTest, EventsAreListedByWhatWasAskedFor) {
     EXPECT_FALSE(std::filesystem::exists(folder_ / "out.mkv")) << "what failed leaves nothing behind";
 }
 
+TEST_F(RecordingsTest, WhatIsRemovedIsFoundNoMoreAndDeletedByTheRecorder) {
+    store::Store store = Open();
+    store::Events events(store);
+    AddRow(events, 1, kStart, base::kReasonContinuous, false);
+    AddRow(events, 1, kStart + 300, base::kReasonContinuous, false);
+    AddRow(events, 2, kStart, base::kReasonContinuous, true);
+    store::Marks marks(store);
+    const int missed = marks.Add(store::MarkKind::kPos, 2, kStart + 9000, 0, "Mrs Miller").id;
+    const int inside = marks.Add(store::MarkKind::kAlert, 1, kStart + 100, 0, "").id;
+    marks.Miss(missed);
+    Play({{"event keep 2", 0, "kept"},
+          {"event remove 2", 65, "is kept: release it first"},
+          {"event remove 3", 65, "still being recorded"},
+          {"event remove 99", 66, "no event 99"},
+          {"event remove " + std::to_string(inside) + " --footage", 65, "not complete yet"},
+          {"event remove " + std::to_string(missed), 0, "was removed.\n"},
+          {"event list --text miller", 0, "no such event"},
+          {"event show " + std::to_string(missed), 66, "there is no event"}});
+    EXPECT_TRUE(events.Find(1)) << "what is refused removes nothing";
+    marks.Miss(inside);
+    Play({{"event remove " + std::to_string(inside) + " --footage --json", 0, "\"recordings\" : 1"},
+          {"event list --camera 1 --json", 0, "\"id\" : 2", "\"id\" : 1,"},
+          {"audit", 0, "event.remove", "Miller"}});
+    const std::vector<store::Event> pending = events.PendingDeletion(1);
+    ASSERT_EQ(pending.size(), 1U);
+    EXPECT_EQ(pending.front().id, 1);
+}
+
 TEST_F(RecordingsTest, MarksArePutDownForTheRecorder) {
     Play({{"event mark 1 --at 2026-03-01T08:15:00Z --text 'at the door' --json", 0, "\"pending\""},
           {"event mark 2 --kind pos --at 2026-03-01T08:15:00Z --length 1m --text '2 x Coffee' --text Total", 0, "id 2"},
