@@ -16,6 +16,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/completion.h"
+#include "standalone/cli/manual.h"
 #include "standalone/media/source.h"
 #include "standalone/remote/certificate.h"
 
@@ -99,6 +100,10 @@ int Run(int argc, char** argv) {
         return kOk;
     }
     try {
+        if (argc == 3 && argv[1] == std::string_view(kManualWord)) {
+            WriteManual(program, argv[2]);
+            return kOk;
+        }
         program.parse(argc, argv);
         return kOk;
     } catch (const CLI::ParseError& error) {
