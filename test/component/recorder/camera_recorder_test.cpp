@@ -4,6 +4,8 @@
 // ends the first.
 #include "standalone/recorder/camera_recorder.h"
 
+#include <cmath>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -33,6 +35,12 @@ class CameraRecorderTest : public testing::Test {
         }
         request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1), "here"};
         recorder_.SetRequest(request_);
+        Send(test::kH264);  // a key frame each second
+    }
+
+    void Send(const char* video_options) {
+        clip_ = &test::MakeClip(video_options);
+        format_ = std::make_shared<media::MediaFormat>(media::MediaFormat{clip_->format.video, {}});
     }
 
     fs::path MountPath(int mount) const { return folder_ / std::to_string(mount); }
@@ -48,7 +56,7 @@ class CameraRecorderTest : public testing::Test {
         for (int i = 0; i < static_cast<int>(seconds * kFps); ++i) {
             now_us_ += 1'000'000 / kFps;
             if (with_pictures) {
-                const test::OwnedPacket& packet = clip_.packets[fed_++ % clip_.packets.size()];
+                const test::OwnedPacket& packet = clip_->packets[fed_++ % clip_->packets.size()];
                 taken_late_us_ = packet.key_frame ? late_us_ : taken_late_us_;
                 recorder_.Take({format_, packet.medium, packet.data, now_us_ - taken_late_us_, packet.key_frame});
             }
@@ -82,9 +90,8 @@ class CameraRecorderTest : public testing::Test {
     CameraRecorder recorder_{7,
                              {rows_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
                               [this] { ++rooms_wanted_; }, 10'000'000}};
-    const test::Clip& clip_ = test::MakeClip(test::kH264);  // a key frame each second
-    const std::shared_ptr<const media::MediaFormat> format_ =
-        std::make_shared<media::MediaFormat>(media::MediaFormat{clip_.format.video, {}});
+    const test::Clip* clip_ = nullptr;
+    std::shared_ptr<const media::MediaFormat> format_;
 };
 
 TEST_F(CameraRecorderTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsEndAlone) {
@@ -135,8 +142,9 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
     struct Row {
         const char* what;
         std::function<void()> happens;
-        std::vector<int> seconds;  // of the events, when it happens after 2.48 s of ten
+        std::vector<double> seconds;  // of the events, when it happens after 2.48 s of ten
         std::int64_t step_ms = 0;
+        const char* video = test::kH264;
     };
     const Row rows[] = {
         {"nothing", [] {}, {10}},
@@ -146,6 +154,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         {"the clock is put right", [&] { wall_ahead_ms_ -= 1'900; }, {10}, -1'900},
         {"the pictures' times go back", [&] { late_us_ = 900'000; }, {3, 7}, -900},
         {"the camera stalls", [&] { Pass(4, false); }, {3, 7}, 4'000},
+        {"a camera of single pictures stalls", [&] { Pass(4, false); }, {2.48, 7.52}, 4'000, test::kMjpeg},
         {"the camera hesitates", [&] { Pass(2.6, false); }, {10}},
         {"another mount", [&] { request_.plan.mount_id = 2, request_.plan.mount = MountPath(2); }, {3, 7}},
     };
@@ -154,6 +163,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         SCOPED_TRACE(row.what);
         const std::int64_t begin_ms = wall_ahead_ms_ + now_us_ / 1000;
         fed_ = 0;
+        Send(row.video);
         Pass(2.48);
         row.happens();
         recorder_.SetRequest(request_);
@@ -164,9 +174,10 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         const std::vector<fs::path> files = Files();
         ASSERT_EQ(files.size() - known, row.seconds.size());
         std::int64_t expected_ms = begin_ms;
-        for (const int seconds : row.seconds) {
+        for (const double seconds : row.seconds) {
             const archive::RecordingReader event(files[known++]);
-            EXPECT_EQ(test::Probe(files[known - 1]), "h264," + std::to_string(seconds * kFps) + "\n");
+            const std::string codec = row.video == test::kMjpeg ? "mjpeg," : "h264,";
+            EXPECT_EQ(test::Probe(files[known - 1]), codec + std::to_string(std::lround(seconds * kFps)) + "\n");
             EXPECT_FALSE(event.Grows());
             const std::string name = files[known - 1].stem().string();
             const int id = std::stoi(name.substr(name.find('-') + 1));
@@ -176,7 +187,7 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
                 return stored && !stored->recording && stored->frame_count == event.FrameCount();
             })) << event.FrameCount();
             EXPECT_NEAR(static_cast<double>(event.StartWallMs() - expected_ms), 40, 1);
-            expected_ms += seconds * 1000 + (expected_ms == begin_ms ? row.step_ms : 0);
+            expected_ms += std::lround(seconds * 1000) + (expected_ms == begin_ms ? row.step_ms : 0);
         }
         if (row.step_ms == 4'000) {
             std::vector<std::uint8_t> log(14);
@@ -187,6 +198,26 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         recorder_.SetRequest(request_);
         OpenStore();  // more numbers
     }
+}
+
+TEST_F(CameraRecorderTest, AnEventGoesOnWhileThereIsNoIdForTheNext) {
+    OpenStore();
+    rows_.Refresh(0);  // fetches no more
+    request_.plan.segment_s = 2;
+    recorder_.SetRequest(request_);
+    Pass(1);
+    const int event = recorder_.OpenEvent();
+    while (rows_.TakeId()) {
+    }
+    for (const bool camera_stalls : {false, true}) {
+        Pass(4, !camera_stalls);
+        Pass(4);
+        EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
+        EXPECT_EQ(recorder_.OpenEvent(), event) << camera_stalls;
+    }
+    OpenStore();
+    Pass(2);
+    EXPECT_GT(recorder_.OpenEvent(), event);
 }
 
 TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {

@@ -131,6 +131,15 @@ TEST_F(RecordingSupervisorTest, AThreadThatCannotBeHadIsTriedAgainAndCostsNoOthe
         const auto mounts = maintenance::ReadMountStatus(installation_);
         return mounts.size() == 1 && mounts[0].state == maintenance::MountState::kReady;
     })) << "its maintenance was tried again, too";
+    const CameraSignal refused{"Camera", true, {{}, base::SignalLoss::kRefused, "Connection refused"}};
+    EXPECT_TRUE(test::Eventually([&] {
+        supervisor.DoEverySecond({{2, refused}});
+        std::string states;
+        for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation_)) {
+            states += NameOf(status.state) + std::string(status.lost_since_s > 0 ? " since " : " ");
+        }
+        return states == "ready no-signal since ready ";
+    })) << "what is to be recorded and does not come";
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
 }
