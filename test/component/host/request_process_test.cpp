@@ -5,11 +5,13 @@
 #include <array>
 #include <chrono>
 #include <csignal>
+#include <fstream>
 #include <iterator>
 #include <random>
 
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 
@@ -46,7 +48,8 @@ using namespace std::chrono_literals;
 constexpr std::size_t kSpares = 4;
 
 TEST(Host, EndsProcessesWhoseClientLeft) {
-    const HostUnderTest host({"--leave-seconds", "0.5"});
+    testing::internal::CaptureStderr();
+    HostUnderTest host({"--leave-seconds", "0.5"});
     const std::string admin = host.LogIn().secret;
     for (const char* method : {"Stream", "Hang", "DeafStream"}) {
         base::FileDescriptor connection = host.Open(method, admin);
@@ -57,6 +60,11 @@ TEST(Host, EndsProcessesWhoseClientLeft) {
         connection.Reset();
         EXPECT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; })) << method;
     }
+    host.End(SIGTERM);
+    const std::string log = testing::internal::GetCapturedStderr();
+    EXPECT_THAT(log, testing::ContainsRegex("error: request process [0-9]+ died of signal 9\n$")) << "the deaf one";
+    EXPECT_EQ(log.find("error: "), log.rfind("error: ")) << "a client that leaves is none";
+    EXPECT_EQ(log.find("warning: "), log.npos);
 }
 
 TEST_F(RunningHost, RepeatsSigtermUntilAHandlerListens) {
@@ -134,6 +142,18 @@ TEST(Host, TakesItsProcessesAlong) {
             EXPECT_FALSE(std::filesystem::exists(socket));
         }
     }
+}
+
+TEST(Host, SweepsThePlayerFilesOfThoseWhoDiedWithAnEarlierHost) {
+    const pid_t dead = test::InChild([] {});
+    test::WaitFor(dead);
+    const std::string file = "/tmp/player_src.pid." + std::to_string(::getpid());
+    std::ofstream(file + "dead") << dead;
+    std::ofstream(file + "a11ce") << ::getpid();
+    const HostUnderTest host;
+    EXPECT_EQ(host.Ask("api=VEXO.Auth&version=1&method=Status", "").status, 401);
+    EXPECT_FALSE(std::filesystem::exists(file + "dead"));
+    EXPECT_TRUE(std::filesystem::remove(file + "a11ce")) << "of a living process";
 }
 
 TEST_F(RunningHost, GivesRequestsToProcessesThatWait) {

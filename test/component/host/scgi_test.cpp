@@ -54,6 +54,16 @@ TEST(Scgi, TakesARequestHoweverItIsCut) {
     }
 }
 
+TEST(Scgi, JoinsTheLinesOfAHeaderAsTheirListIsWritten) {
+    const std::string head =
+        "CONTENT_LENGTH|0|SCGI|1|HTTP_COOKIE|a=1|HTTP_A|1|HTTP_COOKIE|b=2|HTTP_A||HTTP_COOKIE|c=3|";
+    ScgiParser parser;
+    ASSERT_EQ(parser.Feed(Netstring(head)), State::kComplete);
+    const http::Request request = parser.TakeRequest();
+    EXPECT_EQ(request.Header("HTTP_COOKIE"), "a=1; b=2; c=3");
+    EXPECT_EQ(request.Header("HTTP_A"), "1, ");
+}
+
 TEST(Scgi, RefusesWhatIsNotARequest) {
     const std::string kStart = Head("CONTENT_LENGTH|0|SCGI|1|");
     const std::string kBig(ScgiParser::kMaxHeadBytes, 'x');
@@ -86,7 +96,6 @@ TEST(Scgi, RefusesWhatIsNotARequest) {
         {"largest body awaited", Netstring("CONTENT_LENGTH|4096|SCGI|1|"), State::kIncomplete},
         {"SCGI missing", Netstring("CONTENT_LENGTH|0|"), State::kMalformed},
         {"SCGI 2", Netstring("CONTENT_LENGTH|0|SCGI|2|"), State::kMalformed},
-        {"a header in two lines", Netstring(kStart + "HTTP_A|1|HTTP_A|2|"), State::kComplete},
         {"a name twice", Netstring(kStart + "A|1|A|2|"), State::kMalformed},
         {"empty name", Netstring(kStart + "|1|"), State::kMalformed},
         {"value without end", Netstring(kStart + "A|1"), State::kMalformed},
