@@ -13,6 +13,8 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/recording_status.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/users.h"
@@ -26,6 +28,8 @@ namespace {
 
 using testing::HasSubstr;
 using testing::Not;
+
+constexpr std::int64_t kMarch = 1'772'366'400;  // 2026-03-01T12:00:00Z
 
 TEST_F(CliTest, WithoutAnInstallationEveryCommandSaysHowToMakeOneAndWrongUsePointsToTheHelp) {
     for (const char* line : {"camera list", "user list", "log show", "log set debug", "demo setup", "doctor"}) {
@@ -197,6 +201,34 @@ TEST_F(DemoTest, CamerasAreAddedChangedAndRemoved) {
     EXPECT_EQ(camera.FindProfile(0)->fps, 10);
     Play({{"camera set 5 --account ''", 0, "Changed"}});
     EXPECT_FALSE(cameras.FindCredentials(5));
+}
+
+TEST_F(DemoTest, ACameraIsListedWithWhetherItsPicturesComeOrSinceWhenAndWhyNot) {
+    using enum base::SignalLoss;
+    using maintenance::RecordingState;
+    const auto lost = [](int camera, RecordingState state, base::SignalLoss loss) {
+        return maintenance::RecordingStatus{.camera = camera, .state = state, .lost_since_s = kMarch, .loss = loss};
+    };
+    const struct {
+        maintenance::RecordingStatus status;
+        const char *has, *has_not;
+    } rows[] = {
+        {{.camera = 1, .state = RecordingState::kRecording}, "Entrance   recording ", "since"},
+        {{.camera = 1}, "Entrance   ready ", "since"},
+        {lost(1, RecordingState::kNoSignal, kRefused), "Entrance   no-signal since 2026-03-01 ", "ready"},
+        {lost(1, RecordingState::kNoSignal, kRefused), " (refused) ", "recording"},
+        {lost(1, RecordingState::kNoSignal, kWrongPassword), " (wrong-password) ", "ready"},
+        {lost(1, RecordingState::kNoSignal, kStalled), " (stalled) ", "ready"},
+        {lost(1, RecordingState::kNoSignal, kUnknownHost), " (unknown-host) ", "ready"},
+        {lost(1, RecordingState::kDiskFull, kRefused), "Entrance   disk-full, no-signal since 2026-03-01 ", "ready"},
+        {lost(3, RecordingState::kNoSignal, kRefused), "Warehouse  disabled ", "since"},
+    };
+    const base::Installation installation(home_);
+    for (const auto& row : rows) {
+        maintenance::WriteRecordingStatus(installation, {row.status});
+        control::CommonConfigKeeper(installation).Refresh(false);
+        Play({{"camera list", 0, row.has, row.has_not}});
+    }
 }
 
 TEST_F(DemoTest, AccountsAreAddedChangedAndRemoved) {
