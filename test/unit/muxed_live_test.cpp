@@ -101,6 +101,9 @@ const LoopRow kRows[] = {
      Begins(Key(40, "K"), {{}, {}, {}}) + WithSound({Delta(8, "s")}) + At("UpdateStamp()", Later(15)),
      Started("K") + Video(40, {}, "null") + Audio(10001, WriteSound("s")) + NothingNew(40, 8) + kRest +
          NothingNew(40, 8) + Calls{"log live/4 Timeeout [Cam: 5]\n"} + Exit("0", "0")},
+    {"the time-out begins after the flush", Begins(Key(40, "K"), {Delta(41, "d")}) + At("fflush()", Later(21)),
+     Started("K") + Video(40, WriteDelta("d")) + Audio(10001, {}, "null") + NothingNew(41, 10001) + kRest +
+         Exit("1", "0")},
     {"failing output is logged for pictures of the loop only",
      kBoth + [](auto& p) { p.flush_fails = true, p.write_result = -1; },
      Started("KK") + Video(40, WriteDelta("ddd") + Calls{"log live/4 Failed to fflush data [Cam: 5, errno: 32]\n"}) +
