@@ -12,6 +12,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/control/debug_log_config.h"
+#include "standalone/doctor/checks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
@@ -65,9 +66,21 @@ bool AddAdmin(store::Store& store, const std::string& name) {
     return true;
 }
 
+// The store that knew the recordings there may have been lost. They are then more than the limit of a new mount allows,
+// so taking the folder over is left to the command that sets none.
+[[noreturn]] void RefuseFolderOfLostStore(const Console& console, const std::string& folder) {
+    const std::string program = Concat(
+        "lookhaven ", console.home_option.empty() ? "" : Concat("--home ", doctor::Quoted(console.HomePath()), " "));
+    throw Failure(kDataError, "the folder ", folder,
+                  " belongs to another installation of Lookhaven, or to this one before its store was lost: to keep "
+                  "what is recorded there, restore the store from a backup, or run ",
+                  program, "mount add ", doctor::Quoted(folder), " --take-over; then run this command again, and ",
+                  program, "verify --repair");
+}
+
 // The folder "recordings" in the state folder, limited to half of the free space: a trial must not fill the system's
 // disk. False when there is a mount already.
-bool AddDefaultMount(store::Store& store, const base::Installation& installation) {
+bool AddDefaultMount(store::Store& store, const base::Installation& installation, const Console& console) {
     store::Mounts mounts(store);
     if (!mounts.List().empty()) {
         return false;
@@ -80,7 +93,11 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     mount.name = "default";
     mount.path = folder.lexically_normal().string();
     mount.max_bytes = static_cast<std::int64_t>(std::filesystem::space(folder).available / 2);
-    admin::RequireFreeFolder(store, mount.path, 0, false);
+    try {
+        admin::RequireFreeFolder(store, mount.path, 0, false);
+    } catch (const admin::UnusableFolder&) {
+        RefuseFolderOfLostStore(console, mount.path);
+    }
     mount.id = mounts.Add(mount);
     admin::MarkFolder(store, mount);
     admin::ReserveIds(store, mount);
@@ -129,7 +146,7 @@ void Init(const Console& console, const Request& request) {
     CopyOlderStore(installation);
     const int steps = store::Store::Migrate(installation.StoreUrl());
     store::Store store = store::Store::Open(installation.StoreUrl());
-    const bool mount_added = AddDefaultMount(store, installation);
+    const bool mount_added = AddDefaultMount(store, installation, console);
     RenewMarkers(store);
     const bool admin_added = !admin.empty() && AddAdmin(store, admin);
     const std::string home = installation.Home().string();

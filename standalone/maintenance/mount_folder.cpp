@@ -61,6 +61,19 @@ base::FileDescriptor OpenFolderAt(int parent, const char* name) {
     return folder;
 }
 
+// The status of the file, which lies in the folder of that descriptor; nothing when there is no regular file. Throws
+// std::system_error when that cannot be told.
+std::optional<struct stat> RegularFileAt(int folder, const std::filesystem::path& file) {
+    struct stat status {};
+    if (::fstatat(folder, file.filename().c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
+        if (!MeansAbsent(errno)) {
+            base::ThrowErrno("cannot look for " + file.string());
+        }
+        return std::nullopt;
+    }
+    return S_ISREG(status.st_mode) ? std::optional(status) : std::nullopt;
+}
+
 bool IsCameraFolder(const std::string& name) {
     return !name.empty() && name.find_first_not_of("0123456789") == name.npos;
 }
@@ -181,17 +194,7 @@ base::FileDescriptor MountFolder::OpenDay(int camera, std::int64_t second) const
 
 bool MountFolder::Has(const archive::FileName& name) const {
     const base::FileDescriptor day = OpenDay(name.camera, name.start_s);
-    struct stat status {};
-    if (!day) {
-        return false;
-    }
-    if (::fstatat(day.Get(), FileNameOf(name).c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
-        if (!MeansAbsent(errno)) {
-            base::ThrowErrno("cannot look for " + (path_ / archive::PathOf(name)).string());
-        }
-        return false;
-    }
-    return S_ISREG(status.st_mode);
+    return day && RegularFileAt(day.Get(), path_ / archive::PathOf(name));
 }
 
 bool MountFolder::Remove(const archive::FileName& name) const {
@@ -252,11 +255,11 @@ std::vector<MountFolder::File> MountFolder::Files(std::int64_t from_s) const {
             const base::FileDescriptor day_folder =
                 day >= first_day ? OpenFolderAt(folder.Get(), day.c_str()) : base::FileDescriptor();
             for (const std::string& file : day_folder ? NamesIn(day_folder.Get()) : std::vector<std::string>()) {
-                struct stat status {};
                 const std::optional<archive::FileName> name = archive::ParsePath(camera + "/" + day + "/" + file);
-                if (name && ::fstatat(day_folder.Get(), file.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
-                    S_ISREG(status.st_mode)) {
-                    files.push_back({*name, status.st_mtim.tv_sec});
+                const std::optional<struct stat> status =
+                    name ? RegularFileAt(day_folder.Get(), path_ / camera / day / file) : std::nullopt;
+                if (status) {
+                    files.push_back({*name, status->st_mtim.tv_sec});
                 }
             }
         }

@@ -6,6 +6,7 @@
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/deletion.h"
+#include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/recording_recovery.h"
 
 namespace lookhaven::maintenance {
@@ -14,7 +15,8 @@ namespace {
 
 constexpr std::int64_t kDayS = 86'400;
 
-// Trouble with one file must not keep the others from being recovered. False when there was some.
+// What is wrong with one file must not keep the others from being recovered, unless it is the disk that fails. False
+// when something was.
 template <class Work>
 bool Try(Work&& work) {
     try {
@@ -25,6 +27,9 @@ bool Try(Work&& work) {
     } catch (const store::StoreError&) {
         throw;
     } catch (const std::exception& failure) {
+        if (IsDiskFailure(failure)) {
+            throw;
+        }
         base::LogWarning(std::string("cannot recover a recording: ") + failure.what());
         return false;
     }

@@ -12,9 +12,9 @@ namespace lookhaven::maintenance {
 
 // Finishes deletions, closes the mount's open events after their last good frame, removes rows whose file is missing,
 // and imports recordings of today and yesterday that never got a row. Ignores ids from first_reserved_id on: the caller
-// is recording them. Logs what it did; a failure with one file is logged and does not affect the others. False when
-// something failed or the mount is not mounted: try again later. Throws store::StoreError, and std::system_error when
-// the mount cannot be listed.
+// is recording them. Logs what it did; what is wrong with one file is logged and does not affect the others. False when
+// there was something or the mount is not mounted: try again later. Throws store::StoreError, and std::system_error
+// where the disk fails, which ends the pass: the files after it are as they were.
 bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s);
 
 }  // namespace lookhaven::maintenance

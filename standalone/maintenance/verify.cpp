@@ -161,6 +161,9 @@ class Verification {
                 try {
                     archive::ReadSpan(mount.Path() / mark.path);
                 } catch (const std::exception& failure) {
+                    if (IsDiskFailure(failure)) {
+                        throw;
+                    }
                     Report("the span of mark " + std::to_string(mark.id) + " cannot be read: " + failure.what(),
                            [&] { return SaveMark(store_, mark) ? "written again" : ""; });
                 }

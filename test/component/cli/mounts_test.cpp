@@ -3,12 +3,14 @@
 // The command line's view of where and when cameras are recorded: mounts, plans and groups.
 #include <filesystem>
 #include <fstream>
+#include <regex>
 
 #include "standalone/base/file.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
 #include "standalone/store/settings.h"
 #include "test/component/cli/recordings_fixture.h"
+#include "test/support/footage/clips.h"
 
 namespace lookhaven::cli {
 namespace {
@@ -68,6 +70,39 @@ TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
           {"mount remove 1 --forget", 0, "files stay"},
           {"event list", 0, "no such event"}});
     EXPECT_TRUE(std::filesystem::exists(home_ / "recordings"));
+}
+
+TEST_F(MountsTest, WhatInitAdvisesAfterTheLossOfTheStoreKeepsWhatWasRecorded) {
+    const std::filesystem::path mount = home_ / "recordings";
+    const archive::FileName name{1, kStart, 4711, archive::FileKind::kRecording};
+    archive::MakeFolderFor(mount, name);
+    test::Record(test::MakeClip(test::kMjpeg), mount / archive::PathOf(name));
+    for (const auto& made : std::filesystem::recursive_directory_iterator(mount)) {
+        // What has only just been written may still get its row.
+        std::filesystem::last_write_time(made, std::filesystem::file_time_type::clock::now() - std::chrono::hours(24));
+    }
+    for (const char* end : {"", "-wal", "-shm"}) {
+        std::filesystem::remove(home_ / (std::string("lookhaven.db") + end));
+    }
+    for (const std::string& home : {std::string(), "--home " + home_.string() + " "}) {
+        const Outcome refused = Run(home + "init --admin admin", "admin-s3cret\n");
+        EXPECT_EQ(refused.code, 65) << refused.text;
+        std::smatch advised;
+        ASSERT_TRUE(std::regex_search(refused.text, advised,
+                                      std::regex("or run lookhaven (.*); then run this command again, and lookhaven "
+                                                 "(.*)\n")))
+            << refused.text;
+        EXPECT_THAT(advised.str(1), testing::StartsWith(home + "mount add "));
+        if (home.empty()) {
+            continue;
+        }
+        Play({{advised.str(1), 0, "Added mount"},
+              {"init --admin admin", 0, "Added account admin", "", "admin-s3cret\n"},
+              {advised.str(2), 0, "imported"},
+              {"event show 4711", 0, "100 frames"},
+              {"verify", 0, "1 events with 100 frames"},
+              {"mount list --json", 0, "\"max_bytes\" : 0"}});
+    }
 }
 
 TEST_F(MountsTest, PlansAndGroupsAreChangedAndDenied) {

@@ -6,7 +6,6 @@
 #include <fstream>
 
 #include <gmock/gmock.h>
-#include <unistd.h>
 
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
@@ -14,6 +13,7 @@
 #include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
 #include "test/component/maintenance/retention_fixture.h"
+#include "test/support/ordinary_user.h"
 
 namespace lookhaven::maintenance {
 namespace {
@@ -124,13 +124,6 @@ TEST_F(RetentionTest, ADeletionThatACrashInterruptedIsFinished) {
     EXPECT_FALSE(fs::exists(file) || !events.PendingDeletion(footage_.MountId()).empty());
 }
 
-// Root may pass every permission: takes that away until destruction.
-class OrdinaryUser {
-  public:
-    OrdinaryUser() { EXPECT_TRUE(::geteuid() != 0 || ::seteuid(65534) == 0); }
-    ~OrdinaryUser() { EXPECT_EQ(::seteuid(::getuid()), 0); }
-};
-
 TEST_F(RetentionTest, AFolderThatCannotBeOpenedIsNotAnAbsentOne) {
     const int event = footage_.Record(1, kNoon, 60);
     const fs::path camera = footage_.Mount() / "1";
@@ -139,7 +132,7 @@ TEST_F(RetentionTest, AFolderThatCannotBeOpenedIsNotAnAbsentOne) {
     }
     fs::permissions(camera, fs::perms::none);
     {
-        const OrdinaryUser user;
+        const test::OrdinaryUser user;
         EXPECT_THROW(Run(0, 1), std::system_error);
     }
     fs::permissions(camera, fs::perms(0755));

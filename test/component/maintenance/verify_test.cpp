@@ -19,6 +19,7 @@
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/footage/footage.h"
+#include "test/support/ordinary_user.h"
 
 namespace lookhaven::maintenance {
 namespace {
@@ -219,6 +220,57 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     const auto before = State();
     EXPECT_THAT(Verify(Records(), true).faults.front().problem, HasSubstr("is not there, with 4 events"));
     EXPECT_EQ(State(), before);
+}
+
+// Other errors than that a file is absent: neither its row nor another's is touched.
+TEST_F(VerifyTest, AFolderThatCannotBeReadEndsTheWorkOnItsMountAndLosesNothing) {
+    store::Events events(Records());
+    const fs::path day = file_.parent_path();
+    const int later = footage_.Record(2, kStartS + 86400, 4);
+    fs::remove(footage_.FileOf(later));  // so that repair has something to do after the failure
+    const fs::path stray = footage_.Mount() / "3/2026-03-02/120000-4711.mkv";
+    fs::create_directories(stray.parent_path());
+    fs::copy(file_, stray);
+    Age();
+    const auto before = State();
+    for (const fs::path& folder : {folder_.Path(), footage_.Mount()}) {
+        fs::permissions(folder, fs::perms(0755));
+    }
+    for (const auto& entry : fs::recursive_directory_iterator(footage_.Mount())) {
+        fs::permissions(entry, entry.is_directory() ? fs::perms(0777) : fs::perms(0666));
+    }
+    const struct {
+        const char* what;
+        fs::path folder;
+        fs::perms left;
+    } rows[] = {
+        {"a day that cannot be opened", day, fs::perms::none},
+        {"a day whose files cannot be looked at", day, fs::perms(0444)},
+        {"a camera that cannot be opened", day.parent_path(), fs::perms::none},
+        {"a camera whose days cannot be looked at", day.parent_path(), fs::perms(0444)},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.what);
+        fs::permissions(row.folder, row.left);
+        for (const bool repair : {false, true}) {
+            std::vector<Fault> faults;
+            {
+                const test::OrdinaryUser user;
+                faults = Verify(Records(), repair).faults;
+            }
+            ASSERT_FALSE(faults.empty());
+            EXPECT_THAT(faults.back().problem, HasSubstr("was not checked further: "));
+            EXPECT_THAT(faults.back().problem, HasSubstr("Permission denied"));
+            EXPECT_EQ(repair, faults.size() == 1) << "repair stops at the first, a look goes on";
+            fs::permissions(row.folder, fs::perms(0777));
+            EXPECT_TRUE(State() == before) << (repair ? "repair" : "look");
+            fs::permissions(row.folder, row.left);
+        }
+        fs::permissions(row.folder, fs::perms(0777));
+    }
+    Verify(Records(), true);
+    EXPECT_FALSE(events.Find(later)) << "it goes on with the others once it can";
+    EXPECT_FALSE(fs::exists(stray)) << "imported, with an id of its own";
 }
 
 }  // namespace
