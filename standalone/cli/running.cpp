@@ -17,10 +17,24 @@ namespace {
 // A recorder renews its lease every five seconds, later where its store is slow.
 constexpr std::chrono::milliseconds kLeaseTimeout{12'000};
 constexpr std::chrono::milliseconds kLeasePollInterval{500};
+// What a recorder last said of itself counts for five seconds, also when it has ended since.
+constexpr std::chrono::milliseconds kHeartbeatTimeout{7'000};
+constexpr std::chrono::milliseconds kHeartbeatPollInterval{100};
+
+void WaitWhileItCountsAsRunning(const base::Installation& installation) {
+    for (auto waited = std::chrono::milliseconds(0); waited < kHeartbeatTimeout; waited += kHeartbeatPollInterval) {
+        if (control::RecorderProcess(installation) ||
+            control::FindRecorder(installation) == control::RecorderState::kNone) {
+            return;
+        }
+        std::this_thread::sleep_for(kHeartbeatPollInterval);
+    }
+}
 
 }  // namespace
 
 void RequireStopped(const base::Installation& installation) {
+    WaitWhileItCountsAsRunning(installation);
     if (control::FindRecorder(installation) != control::RecorderState::kNone || doctor::HostAnswers(installation)) {
         throw Failure(kUnavailable, "Lookhaven is running for ", installation.Home().string(),
                       ": stop it first (installed services: as root, systemctl stop lookhaven.target)");
