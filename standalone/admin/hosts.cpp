@@ -22,20 +22,30 @@ store::Host RequireHost(store::Store& store, const std::string& name) {
     return *std::move(host);
 }
 
-// The cameras that may move, by the host that has each.
-std::map<int, std::vector<int>> FloatingCameras(store::Store& store, const std::vector<store::Host>& hosts) {
-    std::map<int, std::vector<int>> cameras;
+struct Share {
+    std::size_t cameras = 0;
+    std::vector<int> floating;  // of these, what may move
+};
+
+// Of the hosts that may give and take, by id.
+std::map<int, Share> SharesOf(store::Store& store, const std::vector<store::Host>& hosts) {
+    std::map<int, Share> shares;
     for (const store::Host& host : hosts) {
         if (host.has_room && !host.draining && !host.recorder.empty()) {
-            cameras[host.id];
+            shares[host.id];
         }
     }
     for (const store::CameraLease& lease : store::CameraLeases(store).List()) {
-        if (lease.enabled && lease.fixed_host_id == 0 && cameras.contains(lease.host_id)) {
-            cameras[lease.host_id].push_back(lease.camera_id);
+        const auto share = shares.find(lease.host_id);
+        if (!lease.enabled || share == shares.end()) {
+            continue;
+        }
+        ++share->second.cameras;
+        if (lease.fixed_host_id == 0) {
+            share->second.floating.push_back(lease.camera_id);
         }
     }
-    return cameras;
+    return shares;
 }
 
 }  // namespace
@@ -94,18 +104,22 @@ store::Host RemoveHost(store::Store& store, const Actor& actor, const std::strin
 int BalanceHosts(store::Store& store, const Actor& actor) {
     int moves = 0;
     Apply(store, actor, [&] {
-        std::map<int, std::vector<int>> cameras = FloatingCameras(store, store::Hosts(store).All());
-        const auto fewer = [](const auto& one, const auto& other) { return one.second.size() < other.second.size(); };
+        std::map<int, Share> shares = SharesOf(store, store::Hosts(store).All());
         Json::Value moved;
-        while (cameras.size() > 1) {
-            const auto least = std::ranges::min_element(cameras, fewer);
-            const auto most = std::ranges::max_element(cameras, fewer);
-            if (most->second.size() <= least->second.size() + 1) {
+        while (shares.size() > 1) {
+            const auto least =
+                std::ranges::min_element(shares, {}, [](const auto& share) { return share.second.cameras; });
+            // A host whose cameras are all fixed gives none, however many it has.
+            const auto most = std::ranges::max_element(
+                shares, {}, [](const auto& share) { return share.second.floating.empty() ? 0 : share.second.cameras; });
+            if (most->second.floating.empty() || most->second.cameras <= least->second.cameras + 1) {
                 break;
             }
-            const int camera = most->second.back();
-            most->second.pop_back();
-            least->second.push_back(camera);
+            const int camera = most->second.floating.back();
+            most->second.floating.pop_back();
+            --most->second.cameras;
+            least->second.floating.push_back(camera);
+            ++least->second.cameras;
             store::CameraLeases(store).Move(camera, least->first);
             moved[std::to_string(camera)] = least->first;
             ++moves;

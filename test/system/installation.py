@@ -184,6 +184,14 @@ class Installation:
         self._output.close()
         wait_until(lambda: not any(program(pid) for pid in parts), 10, f"all parts end after {how!r}")
 
+    def kill(self):
+        """All its processes at once, as when the machine loses power."""
+        os.kill(self.server.pid, signal.SIGSTOP)  # it would start again what ends
+        for pid in descendants(self.server.pid):
+            with contextlib.suppress(ProcessLookupError):
+                os.kill(pid, signal.SIGKILL)
+        self.stop(signal.SIGKILL)
+
     def part(self, name):
         """Process id of recorder, webapi or nginx; waits for it."""
         wanted = {"nginx": "nginx:"}.get(name, f"lookhaven-{name}")
