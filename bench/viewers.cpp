@@ -101,7 +101,8 @@ int Run(const Options& options) {
     std::cout << "{\"pictures\":" << latencies.size() << ",\"bytes\":" << bytes << ",\"ended\":" << ended
               << ",\"seconds\":" << static_cast<double>(MonotonicMicros() - start) / 1e6
               << ",\"p50_micros\":" << bench::Percentile(latencies, 0.5)
-              << ",\"p99_micros\":" << bench::Percentile(latencies, 0.99) << "}\n";
+              << ",\"p99_micros\":" << bench::Percentile(latencies, 0.99)
+              << ",\"longest_micros\":" << bench::Percentile(latencies, 1) << "}\n";
     return 0;
 }
 

@@ -1,9 +1,10 @@
 # SPDX-License-Identifier: Apache-2.0
-"""What stands around an installation under torture: its wall clock, a viewer, and a look into a recording."""
+"""What stands around an installation under torture: its wall clock, a viewer, and a look at what it leaves."""
 
 import contextlib
 import datetime
 import json
+import pathlib
 import struct
 import subprocess
 import threading
@@ -59,6 +60,11 @@ class Watcher:
     def close(self):
         self._stop.set()
         self._thread.join()
+
+
+def player_files(sessions):
+    """Files of these sessions' players; all installations of a machine keep theirs in one folder."""
+    return [file for session in sessions if (file := pathlib.Path(f"/tmp/player_src.pid.{session}")).exists()]
 
 
 def last_frame_s(recording):

@@ -6,7 +6,6 @@ promise, and keeps the state folder then."""
 import argparse
 import collections
 import contextlib
-import errno
 import json
 import os
 import pathlib
@@ -22,15 +21,16 @@ ROOT = pathlib.Path(__file__).resolve().parents[2]
 sys.path[:0] = [str(ROOT / "test/system"), str(ROOT / "bench")]
 from installation import LIVE, PASSWORDS, Installation, children, program, wait_until  # noqa: E402
 from postgres import Postgres  # noqa: E402
-from environment import RESTART_S, Clock, Watcher, last_frame_s  # noqa: E402
+from environment import RESTART_S, Clock, Watcher, last_frame_s, player_files  # noqa: E402
+from players import playing  # noqa: E402
 
 MAX_LOST_S = 1.0  # of footage, by a killed recorder
 CLOCKS_S = (0, 10, -10, 3600, -3600, 7200)  # ahead of the machine's
 
 
 class Torture:
-    def __init__(self, server, postgres, clock):
-        self.server, self.postgres, self.clock = server, postgres, clock
+    def __init__(self, server, postgres, clock, hurry=False):
+        self.server, self.postgres, self.clock, self._hurry = server, postgres, clock, hurry
         self.counts, self.lost, self.recorders = collections.Counter(), [], {server.part("recorder")}
         self._decoded = set()
         self.camera = self._add_camera("Tortured", server.cli("mount", "list", "--json"))
@@ -39,7 +39,8 @@ class Torture:
         if os.geteuid() == 0:
             self._mount_disk()
             self.cli("mount", "add", "--name", "Small disk", str(self.disk))
-            self._add_camera("On the small disk", server.cli("mount", "list", "--json"))
+            self.small = self._add_camera("On the small disk", server.cli("mount", "list", "--json"))
+        self._recorded = {self.camera, self.small} if os.geteuid() == 0 else {self.camera}
         self.watcher = Watcher(server, self.camera)
         self.watcher.sees_more()
 
@@ -61,6 +62,19 @@ class Torture:
     def recordings(self):
         return sorted(self.server.home.glob(f"recordings/{self.camera}/*/*.mkv"), key=lambda path: path.stat().st_mtime)
 
+    def finished(self):
+        """Recorded events of all cameras that have ended, each with its file."""
+        folders = {mount["id"]: mount["path"] for mount in json.loads(self.cli("mount", "list", "--json"))}
+        events = json.loads(self.cli("event", "list", "--finished", "--limit", "1000000", "--json"))
+        return [(event, pathlib.Path(folders[event["mount_id"]], event["path"])) for event in events]
+
+    def sessions(self):
+        statement = "select handle from sessions"
+        if self.postgres is not None:
+            return self.postgres.ask("torture", statement).split()
+        with contextlib.closing(sqlite3.connect(self.server.home / "lookhaven.db", timeout=20)) as database:
+            return [handle for handle, in database.execute(statement)]
+
     # --- what is done
 
     def kill_recorder(self):
@@ -68,6 +82,8 @@ class Torture:
         newest = self.recordings()[-1:]
         killed_s = self.clock.now_s()
         os.kill(self.server.part("recorder"), signal.SIGKILL)
+        if self._hurry:
+            self._end_pause()
         last_s = last_frame_s(newest[0]) if newest else None
         if last_s is not None:
             self.lost.append(killed_s - last_s)
@@ -76,6 +92,29 @@ class Torture:
         assert self.watcher.connections == connections, "a viewer had to come back after the recorder was killed"
         self.recorders.add(self.server.part("recorder"))
         wait_until(lambda: self.camera in self.server.recording_cameras(), RESTART_S, "it records again")
+
+    def _end_pause(self):
+        """The script waits up to 8 s before it starts a part again; the only other thing that it waits for takes 60 s."""
+        def pause():
+            commands = {pid: pathlib.Path(f"/proc/{pid}/cmdline") for pid in children(self.server.server.pid)}
+            for pid, command in commands.items():
+                with contextlib.suppress(OSError):
+                    words = command.read_bytes().split(b"\0")
+                    if words[0] == b"sleep" and words[1] != b"60":
+                        return pid
+        with contextlib.suppress(ProcessLookupError):
+            os.kill(wait_until(pause, 5, "the script has noticed"), signal.SIGTERM)
+
+    def kill_player(self):
+        """One who plays a recording: the host removes the player's file."""
+        events = wait_until(lambda: [event for event, _ in self.finished() if event["camera_id"] == self.camera], 30,
+                            "an event has ended")
+        longest = max(events, key=lambda event: event["frame_count"])
+        with playing(self.server, longest["id"]) as player:
+            player.next()
+            file, = player_files(self.sessions())
+            os.kill(int(file.read_text()), signal.SIGKILL)
+            wait_until(lambda: not file.exists(), 5, "the player's file goes")
 
     def kill_host(self):
         os.kill(self.server.part("webapi"), signal.SIGKILL)
@@ -131,16 +170,15 @@ class Torture:
         (self.disk / "filler").unlink()
 
     def remount_disk_read_only(self):
-        """Laid over itself: the kernel refuses to write-protect a file system while a file on it is open for writing."""
+        """Laid over itself: the kernel refuses to write-protect a file system while a file on it is open for writing. So
+        the recorder notices with its next file, or, on a full disk, with the next one that retention is to remove."""
         subprocess.run(["mount", "--bind", self.disk, self.disk], check=True)
-        subprocess.run(["mount", "-o", "remount,bind,ro", self.disk], check=True)
         try:
-            (self.disk / "probe").touch()
-            raise AssertionError("the disk can be written")
-        except OSError as error:
-            assert error.errno == errno.EROFS, error
-        time.sleep(random.uniform(0.5, 3))
-        subprocess.run(["umount", "--lazy", self.disk], check=True)
+            subprocess.run(["mount", "-o", "remount,bind,ro", self.disk], check=True)
+            assert os.statvfs(self.disk).f_flag & os.ST_RDONLY, "the disk can be written"
+            wait_until(self._is_found_read_only, 60, "the recorder finds the disk read-only")
+        finally:
+            subprocess.run(["umount", "--lazy", self.disk], check=True)
 
     def unplug_disk(self):
         """Away, with all that is on it, and another one in its place."""
@@ -153,17 +191,24 @@ class Torture:
         parking.mkdir(exist_ok=True)
         return parking
 
+    def _is_found_read_only(self):
+        run = self.server.home / "run"
+        states = [line.split()[:2] for line in (run / "recordings").read_text().splitlines()]
+        is_full = [str(self.small), "disk-full"] in states
+        return [str(self.small), "disk-fails"] in states or is_full and "Read-only" in (run / "mounts").read_text()
+
     # --- what must hold
 
     def check(self):
         self.watcher.sees_more()
-        wait_until(lambda: self.camera in self.server.recording_cameras(), RESTART_S, "it records")
+        wait_until(lambda: self._recorded <= self.server.recording_cameras(), RESTART_S + 40, "all is recorded")
         self._agree_within(60)
-        for recording in self.recordings()[:-1]:
-            if recording not in self._decoded:
-                decoder = ["ffmpeg", "-v", "error", "-xerror", "-i", recording, "-f", "null", "-"]
+        for _, recording in self.finished():
+            if recording not in self._decoded and recording.exists():  # retention may be faster
+                # In the file's own time base: else ffmpeg guesses a rate, and complains of times that it has rounded itself.
+                decoder = ["ffmpeg", "-v", "error", "-xerror", "-i", recording, "-enc_time_base", "-1", "-f", "null", "-"]
                 done = subprocess.run(decoder, capture_output=True, text=True, check=False)
-                assert done.returncode == 0 and not done.stderr, f"{recording}: {done.stderr}"
+                assert done.returncode == 0 and not done.stderr or not recording.exists(), f"{recording}: {done.stderr}"
                 self._decoded.add(recording)
 
     def _agree_within(self, seconds):
@@ -190,8 +235,8 @@ class Torture:
 
 def run(torture, seconds):
     """For that long; 0: does everything once."""
-    actions = [torture.kill_recorder, torture.kill_request, torture.cut_clients, torture.kill_host, torture.kill_web_server,
-               torture.hang_recorder, torture.lose_store, torture.step_clock]
+    actions = [torture.kill_recorder, torture.kill_request, torture.kill_player, torture.cut_clients, torture.kill_host,
+               torture.kill_web_server, torture.hang_recorder, torture.lose_store, torture.step_clock]
     if os.geteuid() == 0:
         actions += [torture.fill_disk, torture.remount_disk_read_only, torture.unplug_disk]
     if seconds:
@@ -222,6 +267,7 @@ def main():
     options.add_argument("--seconds", type=float, default=600)
     options.add_argument("--short", action="store_const", dest="seconds", const=0, help="do everything once")
     options.add_argument("--seed", type=int, default=int(time.time()))
+    options.add_argument("--hurry", action="store_true", help="kill the recorder more often: do not let script/server pause")
     options.add_argument("--postgresql", action="store_true", help="keep the records there instead of in SQLite")
     chosen = options.parse_args()
     random.seed(chosen.seed)
@@ -238,7 +284,7 @@ def main():
         server.start()
         torture = None
         try:
-            torture = Torture(server, postgres, clock)
+            torture = Torture(server, postgres, clock, chosen.hurry)
             run(torture, chosen.seconds)
         except BaseException:
             server.keep()
@@ -251,9 +297,9 @@ def main():
                                   "lost a kill, max s": round(max(torture.lost, default=0), 3)}), flush=True)
                 torture.close()
             server.stop()
+        assert not player_files(torture.sessions()), "player files are left"
         server.discard()
     assert not segments_of(torture.recorders), "shared memory is left"
-    assert not list(pathlib.Path("/tmp").glob("player_src.pid.*")), "player files are left"
 
 
 if __name__ == "__main__":
