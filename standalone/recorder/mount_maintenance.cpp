@@ -5,7 +5,6 @@
 #include <system_error>
 #include <utility>
 
-#include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/recovery.h"
@@ -43,8 +42,8 @@ maintenance::MountStatus MountMaintenance::Status() const {
 }
 
 void MountMaintenance::Work(store::Store& store) {
-    const std::int64_t now_us = base::MonotonicMicros();
-    const std::int64_t now_s = base::WallSeconds();
+    const std::int64_t now_us = context_.monotonic_us();
+    const std::int64_t now_s = context_.wall_s();
     const Clock clock{now_s, clock_watch_.IsTrusted(now_us, now_s)};
     // Without ids of its own the recorder could not tell its events from those of another one.
     if (!context_.first_reserved_id()) {
@@ -79,7 +78,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         SetStatus(MountState::kInUse, mount.path);
         return;
     }
-    const std::int64_t now_us = base::MonotonicMicros();
+    const std::int64_t now_us = context_.monotonic_us();
     if (!is_recovered_ && now_us >= after_recovery_.until_us) {
         after_recovery_.Begin(now_us);
         try {

@@ -13,6 +13,7 @@
 #include <optional>
 #include <string>
 
+#include "standalone/base/clock.h"
 #include "standalone/maintenance/clock_watch.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_lock.h"
@@ -29,6 +30,8 @@ struct MaintenanceContext {
     std::function<std::optional<int>()> first_reserved_id;  // as EventRowQueue::FirstReservedId
     maintenance::FootageIsComplete is_complete;
     const std::atomic<int>& space_requests;  // grows when a disk is full
+    std::function<std::int64_t()> monotonic_us = base::MonotonicMicros;
+    std::function<std::int64_t()> wall_s = base::WallSeconds;
 };
 
 class MountMaintenance {

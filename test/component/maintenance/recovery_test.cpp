@@ -4,38 +4,18 @@
 #include "standalone/maintenance/recovery.h"
 
 #include <array>
-#include <cerrno>
 #include <memory>
 
-#include <dlfcn.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
+#include "test/support/failing_status.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
 #include "test/support/footage/footage.h"
 #include "test/support/ordinary_user.h"
-
-namespace {
-
-std::string g_unreadable;  // a file's name
-
-}  // namespace
-
-// In the place of the C library's: a disk that cannot read where a file lies that its folder lists.
-extern "C" int fstatat(int folder, const char* name, struct stat* status, int flags) noexcept {
-    // By the name that it has where sizes and times have 64 bits.
-    constexpr const char* kName = sizeof(void*) == 8 ? "fstatat64" : "__fstatat64_time64";
-    static const auto real = reinterpret_cast<decltype(&fstatat)>(::dlsym(RTLD_NEXT, kName));
-    if (name == g_unreadable) {
-        errno = EIO;
-        return -1;
-    }
-    return real(folder, name, status, flags);
-}
 
 namespace lookhaven::maintenance {
 namespace {
@@ -138,11 +118,12 @@ TEST_F(RecoveryTest, WhatIsWrongWithOneFileCostsThatFileAlone) {
 
 // Only the listing finds a recording that has no row: what it leaves out is never imported.
 TEST_F(RecoveryTest, ARecordingThatCannotBeLookedAtIsNotPassedOver) {
-    g_unreadable = FileOf(2).filename();
+    const std::string name = FileOf(2).filename();
+    test::g_unreadable = name.c_str();
     store::Events(footage_.Records()).Remove(std::array{1, 2, 3});
     EXPECT_THROW(Run(), std::system_error);
     EXPECT_EQ(Rows(), "---") << "nothing is imported before all is listed";
-    g_unreadable.clear();
+    test::g_unreadable = nullptr;
     EXPECT_TRUE(Run());
     EXPECT_EQ(Rows(), "ccc");
 }
