@@ -52,9 +52,12 @@ Findings CheckStore(const base::Installation& installation) {
         const bool is_newer = sentence.find("newer") != std::string::npos;
         return {{sentence, is_newer ? "update Lookhaven on this host" : "lookhaven init"}};
     } catch (const store::StoreError& error) {
-        return {{error.what(), IsMalformed(error.what())
-                                   ? kRestore
-                                   : "check that the file or database server is there and that you have access"}};
+        return {{error.what(),
+                 IsMalformed(error.what()) ? kRestore
+                 : installation.StoreUrl() == "sqlite:" + file.string()
+                     ? "check that the file lookhaven.db is there and that you have access"
+                     : "check the address in the file \"store\" in the state folder, and whether what it names can be "
+                       "reached"}};
     } catch (const std::exception& error) {
         return {{error.what(), "check the file \"store\" in the state folder"}};
     }

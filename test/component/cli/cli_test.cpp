@@ -262,6 +262,20 @@ TEST_F(DemoTest, AccountsAreAddedChangedAndRemoved) {
           {"user remove bob --json", 66, "\"code\" : 66"}});
 }
 
+TEST_F(DemoTest, AStoreOfAnotherVersionIsLeftAsItIsByAllButInit) {
+    const std::string version = std::to_string(store::Store::SchemaVersion());
+    Sql({"update schema_version set version = 99"});
+    for (const char* line : {"camera list", "user remove viewer", "verify --repair", "init --admin admin"}) {
+        Play({{line, 78, "has schema 99, newer than this program's " + version, "", "admin-s3cret\n"}});
+    }
+    Sql({"update schema_version set version = " + version});
+    UndoLastMigration();
+    for (const char* line : {"camera list", "user remove viewer", "verify --repair"}) {
+        Play({{line, 78, "run lookhaven init"}});
+    }
+    Play({{"init --json", 0, "\"migrations\" : 1"}, {"user list", 0, "viewer"}, {"camera list", 0, "Entrance"}});
+}
+
 TEST_F(CliTest, LogLevelsAreSetPerCategoryAndProcess) {
     const std::string self = std::to_string(::getpid());
     Play({{"init", 0, "ready"},
@@ -338,6 +352,35 @@ TEST_F(DemoTest, ABackupThatIsCutOffLeavesNoFile) {
         EXPECT_EQ(WTERMSIG(test::WaitFor(backup)), signal);
         EXPECT_TRUE(test::Eventually([&] { return NamesIn(place).empty(); })) << signal;
     }
+}
+
+// Root may write to a folder of somebody else's.
+TEST_F(DemoTest, NobodyPutsAFileOrFolderOfHisInThePlaceOfABackup) {
+    const std::filesystem::path place = folder_ / "place";
+    const std::filesystem::path away = folder_ / "away";
+    const std::filesystem::path work = home_ / "run/backup";
+    for (const bool swaps_folder : {false, true}) {
+        std::filesystem::create_directory(place);
+        std::filesystem::remove_all(work);
+        base::FileDescriptor lock = base::LockFile(base::Installation(home_).CertificateLockFile());
+        const pid_t backup = test::InChild([&] {
+            ::execl(LOOKHAVEN_PROGRAM, "lookhaven", "--home", home_.c_str(), "backup", "--certificate",
+                    (place / "backup").c_str(), nullptr);
+        });
+        EXPECT_TRUE(test::Eventually([&] { return !NamesIn(work).empty(); })) << "it waits for the lock";
+        ASSERT_EQ(NamesIn(place).size(), 1U);
+        if (swaps_folder) {
+            std::filesystem::rename(place, away);
+            std::filesystem::create_directory(place);
+        } else {
+            std::ofstream(folder_ / "other") << "not the backup";
+            std::filesystem::rename(folder_ / "other", place / NamesIn(place).front());
+        }
+        lock.Reset();
+        EXPECT_EQ(test::WaitFor(backup) == 0, swaps_folder);
+        EXPECT_THAT(NamesIn(place), testing::IsEmpty());
+    }
+    EXPECT_THAT(NamesIn(away), testing::ElementsAre("backup"));
 }
 
 TEST_F(DemoTest, ATerminalNeverShowsAPassword) {

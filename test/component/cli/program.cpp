@@ -12,6 +12,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/store/connection.h"
 #include "test/support/process.h"
 
 namespace lookhaven::cli {
@@ -118,6 +119,21 @@ void CliTest::Play(const std::vector<Row>& rows) {
 
 store::Store CliTest::Open() {
     return store::Store::Open(base::Installation(home_).StoreUrl());
+}
+
+void CliTest::Sql(const std::vector<std::string>& statements) {
+    const std::string url = base::Installation(home_).StoreUrl();
+    store::Connection(store::StoreAddress::Parse(url)).Write([&](soci::session& sql) {
+        for (const std::string& statement : statements) {
+            sql << statement;
+        }
+    });
+}
+
+void CliTest::UndoLastMigration() {
+    Sql({"drop table hosts", "drop table camera_leases", "delete from counters where name = 'host'",
+         "alter table cameras drop column host_id", "alter table mounts drop column host_id",
+         "update schema_version set version = version - 1"});
 }
 
 void CliTest::SetUpDemo() {

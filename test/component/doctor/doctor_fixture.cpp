@@ -10,7 +10,6 @@
 #include "standalone/base/installation.h"
 #include "standalone/control/common_config.h"
 #include "standalone/store/cameras.h"
-#include "standalone/store/connection.h"
 #include "standalone/store/events.h"
 #include "standalone/store/users.h"
 
@@ -45,7 +44,7 @@ void DoctorTest::StartHost(const char* answer) {
 cli::Outcome DoctorTest::Examine() {
     control::CommonConfigKeeper(base::Installation(home_)).Refresh(false);
     if (is_root_) {
-        Shell("chown 65534:65534 " + home_.string() + "/run/*")();
+        Shell("chown -h 65534:65534 " + home_.string() + "/run/*")();
     }
     return Run("doctor");
 }
@@ -75,10 +74,7 @@ void DoctorTest::ExpectFoundAndMended(std::span<const Fault> faults) {
 }
 
 std::function<void()> DoctorTest::Sql(const std::string& statement) {
-    return [this, statement] {
-        const std::string url = base::Installation(home_).StoreUrl();
-        store::Connection(store::StoreAddress::Parse(url)).Write([&](soci::session& sql) { sql << statement; });
-    };
+    return [this, statement] { CliTest::Sql({statement}); };
 }
 
 std::function<void()> DoctorTest::Shell(const std::string& command) {

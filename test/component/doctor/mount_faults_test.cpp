@@ -15,11 +15,17 @@
 namespace lookhaven::doctor {
 namespace {
 
+using maintenance::MountState;
+
 TEST_F(DoctorTest, FaultsOfMountsAreFoundAndMendedWithoutLoss) {
     const bool may_mount =
         is_root_ && ::unshare(CLONE_NEWNS) == 0 && ::mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0;
     const std::string recordings = Recordings();
     const std::string marker = recordings + "/.lookhaven-mount";
+    const auto report = [&](const maintenance::MountStatus& status) {
+        return [this, status] { maintenance::WriteMountStatus(base::Installation(home_), {status}); };
+    };
+    const auto report_nothing = [&] { maintenance::WriteMountStatus(base::Installation(home_), {}); };
     const Fault faults[] = {
         {"no mount", Sql("delete from mounts"), "no mount to record to"},
         {"disabled mount", Sql("update mounts set enabled = 0"), "is disabled, so that 2 of the cameras"},
@@ -30,6 +36,7 @@ TEST_F(DoctorTest, FaultsOfMountsAreFoundAndMendedWithoutLoss) {
         {"another's folder", Shell("echo lookhaven mount 2 of another > " + marker), "another mount or installation"},
         {"mount that its owner may not write to", Shell("chmod 500 " + recordings), "does not permit its owner"},
         {"mount of root", Shell("chown 0:0 " + recordings), "belongs to root and cannot", {}, is_root_},
+        {"marker of root", Shell("chown 0:0 " + marker + " && chmod 600 " + marker), "cannot be read", {}, is_root_},
         {"read-only mount",
          Shell("mount --bind " + recordings + " " + recordings + " && mount -o remount,bind,ro " + recordings),
          "mounted read-only",
@@ -39,6 +46,15 @@ TEST_F(DoctorTest, FaultsOfMountsAreFoundAndMendedWithoutLoss) {
          Shell("mount -t tmpfs -o size=5m tmpfs " + recordings + " && cp -p " + recordings + "-marker " + marker +
                " && chown 65534 " + recordings + " && head -c 4m /dev/zero > " + recordings + "/greedy"),
          "left, recording needs", Shell("rm " + recordings + "/greedy"), may_mount},
+        {"camera's folder of root",
+         Shell("mkdir -m 700 " + recordings + "/7"),
+         "recordings/7 belongs to root and cannot",
+         {},
+         is_root_},
+        {"camera's folder that its owner may not write to",
+         Shell("mkdir " + recordings + "/8 && chown --reference=" + recordings + " " + recordings + "/8 && chmod 500 " +
+               recordings + "/8"),
+         "recordings/8 does not permit its owner"},
         {"above the limit",
          [&] {
              Sql("update mounts set max_bytes = 10")();
@@ -57,13 +73,12 @@ TEST_F(DoctorTest, FaultsOfMountsAreFoundAndMendedWithoutLoss) {
              store::Events(store).AddAll(std::vector{event});
          },
          "whatever else is recorded is deleted at once", [&] { EXPECT_EQ(Run("mount set 2 --limit 1G").code, 0); }},
-        {"disk that snapshots fill",
-         [&] {
-             maintenance::WriteMountStatus(base::Installation(home_),
-                                           {{2, maintenance::MountState::kSpaceHeld, recordings}});
-         },
-         "gets no space back from deleted recordings",
-         [&] { maintenance::WriteMountStatus(base::Installation(home_), {}); }},
+        {"disk that snapshots fill", report({2, MountState::kSpaceHeld, recordings}),
+         "gets no space back from deleted recordings", report_nothing},
+        {"disk that fails", report({2, MountState::kFailing, "cannot remove 1/2: Input/output error"}),
+         "1/2: Input/output error", report_nothing},
+        {"mount of a copy of the state folder", report({2, MountState::kInUse, recordings}),
+         "do: stop that recorder, or give", report_nothing},
     };
     ExpectFoundAndMended(faults);
 }

@@ -10,6 +10,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
+#include "standalone/control/common_config.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/ring/writer.h"
 #include "standalone/store/servers.h"
@@ -32,12 +33,32 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
                                                .lost_since_s = 1,
                                                .loss = base::SignalLoss::kWrongPassword,
                                                .loss_reason = "cannot open: 401"};
+    auto refused = refuses, untrusted = refuses, mount_gone = refuses, no_id = refuses;
+    refused.loss = base::SignalLoss::kRefused;
+    untrusted.loss = base::SignalLoss::kCertificate;
+    mount_gone.lost_since_s = no_id.lost_since_s = 0;
+    mount_gone.state = maintenance::RecordingState::kMountGone;
+    no_id.state = maintenance::RecordingState::kNoEventId;
+    const auto configuration = (home_ / "run/nginx.conf").string();
     const Fault faults[] = {
         {"camera that is down", WriteStatus({refuses}), "(Entrance) has sent no picture since ",
          [&] {
              EXPECT_EQ(Run("camera set 1 --account root", "camera-s3cret\n").code, 0);
              WriteStatus({})();
          }},
+        {"camera that has moved", WriteStatus({refused}), "do: switch the camera on",
+         [&] {
+             EXPECT_EQ(Run("camera set 1 --source test:mjpeg").code, 0);
+             WriteStatus({})();
+         }},
+        {"camera of a foreign authority", WriteStatus({untrusted}), "do: have an authority that this machine trusts",
+         [&] {
+             EXPECT_EQ(Run("camera set 1 --insecure").code, 0);
+             WriteStatus({})();
+         }},
+        {"camera whose mount is away", WriteStatus({mount_gone}), "do: check that its mount is enabled",
+         WriteStatus({})},
+        {"camera without event ids", WriteStatus({no_id}), "do: repair the store", WriteStatus({})},
         {"another recorder", Sql("update recorder_lease set holder = '/var on nvr2'"), "/var on nvr2",
          Sql("update recorder_lease set holder = ''")},
         {"mute host", [&] { StartHost(""); }, "do: start the server", [&] { StartHost(); }},
@@ -45,10 +66,14 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
         {"expired certificate", MakeCertificate(0), "has expired", MakeCertificate(90)},
         {"damaged certificate", Shell(": > " + home_.string() + "/tls/certificate.pem"),
          "cannot be used: ", MakeCertificate(90)},
-        {"no web server",
-         [&] { std::ofstream(home_ / "run/nginx.conf") << "    listen 127.0.0.1:" << port << " sndbuf=192k;\n"; },
+        {"no web server", [&] { std::ofstream(configuration) << "    listen 127.0.0.1:" << port << " sndbuf=192k;\n"; },
          "the web server does not answer",
          [&] { web = std::make_unique<cli::FakeHost>(std::move(web_port), "HTTP/1.1 200"); }},
+        {"web server that has ended",
+         Shell("mv " + configuration + " " + configuration + "-kept && ln -s /none " + configuration),
+         "the web server does not run", Shell("mv " + configuration + "-kept " + configuration)},
+        {"no certificate", Shell("rm " + home_.string() + "/tls/certificate.pem"),
+         "do: restart the server, which makes", MakeCertificate(90)},
         {"lost host",
          [&] {
              store::RecordingServer annex{.name = "Annex", .address = "127.0.0.1", .port = 1};
@@ -59,6 +84,49 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
          "Annex at 127.0.0.1 port 1 fails: ", [&] { EXPECT_EQ(Run("server set 1 --disable").code, 0); }},
     };
     ExpectFoundAndMended(faults);
+}
+
+// Listens on this machine's IPv6 address, where it has one.
+base::FileDescriptor BindIpv6(int& port) {
+    base::FileDescriptor listener(::socket(AF_INET6, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    sockaddr_in6 address{};
+    address.sin6_family = AF_INET6;
+    address.sin6_addr = in6addr_loopback;
+    socklen_t size = sizeof address;
+    if (::bind(listener.Get(), reinterpret_cast<const sockaddr*>(&address), size) != 0) {
+        return {};
+    }
+    ::getsockname(listener.Get(), reinterpret_cast<sockaddr*>(&address), &size);
+    port = ::ntohs(address.sin6_port);
+    return listener;
+}
+
+TEST_F(DoctorTest, Ipv6IsNotedWhereTheMachineHasItAndTheWebServerDoesNot) {
+    MakeCertificate(90)();
+    int port = 0;
+    int port_v6 = 0;
+    base::FileDescriptor listener = cli::BindPort(port);
+    base::FileDescriptor listener_v6 = BindIpv6(port_v6);
+    const bool has_v6 = static_cast<bool>(listener_v6);
+    const auto configuration = home_ / "run/nginx.conf";
+    const cli::FakeHost web(std::move(listener), "HTTP/1.1 200");
+    std::ofstream(configuration) << "    listen 127.0.0.1:" << port << ";\n";
+    const char* const note =
+        "note     web server\n         this machine has IPv6, where the web server does not listen";
+    const cli::Outcome without = Examine();
+    EXPECT_EQ(without.code, 0) << without.text;
+    EXPECT_EQ(without.text.find(note) != std::string::npos, has_v6) << without.text;
+    if (!has_v6) {
+        GTEST_SKIP() << "this machine has no IPv6";
+    }
+    std::ofstream(configuration, std::ios::app) << "    listen [::]:" << port_v6 << ";\n";
+    const cli::Outcome deaf = Examine();
+    EXPECT_EQ(deaf.code, 1) << deaf.text;
+    EXPECT_THAT(deaf.text, HasSubstr("the web server does not answer at ::1 port " + std::to_string(port_v6)));
+    const cli::FakeHost web_v6(std::move(listener_v6), "HTTP/1.1 200");
+    const cli::Outcome with = Examine();
+    EXPECT_EQ(with.code, 0) << with.text;
+    EXPECT_THAT(with.text, testing::Not(HasSubstr("IPv6")));
 }
 
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
@@ -76,6 +144,10 @@ TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
     EXPECT_EQ(outcome.code, 1) << outcome.text;
     EXPECT_THAT(outcome.text, HasSubstr("of camera 1 was left behind"));
     EXPECT_THAT(Run("doctor --json").text, HasSubstr("\"remedy\" : \"start the recorder"));
+    control::MapCommonConfig(installation)->timestamp_sec -= 600;  // of this process, which lives on
+    const cli::Outcome hanging = Run("doctor");
+    EXPECT_EQ(hanging.code, 1) << hanging.text;
+    EXPECT_THAT(hanging.text, HasSubstr("the recorder hangs"));
     EXPECT_EQ(test::WaitFor(test::InChild([&] {
                   BecomeOwner();
                   _exit(ring::RemoveOrphans(installation) == 1U ? 0 : 1);

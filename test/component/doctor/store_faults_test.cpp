@@ -17,23 +17,22 @@ TEST_F(DoctorTest, FaultsOfFolderAndStoreAreFoundAndMendedWithoutLoss) {
         {"open folder", Shell("chmod 755 " + home_.string()), "open to other users"},
         {"readable store", Shell("chmod 644 " + database), "lookhaven.db is open"},
         {"store of root", Shell("chown 0:0 " + database), "lookhaven.db belongs to root", {}, is_root_},
+        {"store that its owner may not write to", Shell("chmod 400 " + database), "does not permit its owner"},
+        {"store that cannot be reached",
+         Shell("echo postgresql:host=/none > " + home_.string() + "/store && chmod 600 " + home_.string() +
+               "/store && chown --reference=" + database + " " + home_.string() + "/store"),
+         "do: check the address in the file \"store\"", Shell("rm " + home_.string() + "/store")},
+        {"store with a wrong address",
+         Shell("echo nonsense > " + home_.string() + "/store && chmod 600 " + home_.string() +
+               "/store && chown --reference=" + database + " " + home_.string() + "/store"),
+         "do: check the address in the file \"store\"", Shell("rm " + home_.string() + "/store")},
         {"malformed store",
          Shell("cp " + database + " " + database + "-backup && printf nothing | dd conv=notrunc of=" + database +
                " 2>/dev/null"),
          "do: stop the server, replace the store", Shell("cat " + database + "-backup > " + database)},
         {"newer store", Sql("update schema_version set version = 99"), "update Lookhaven",
          Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))},
-        // As before the last step in store/schema.cpp.
-        {"older store",
-         [&] {
-             Sql("drop table hosts")();
-             Sql("drop table camera_leases")();
-             Sql("delete from counters where name = 'host'")();
-             Sql("alter table cameras drop column host_id")();
-             Sql("alter table mounts drop column host_id")();
-             Sql("update schema_version set version = version - 1")();
-         },
-         "do: lookhaven init"},
+        {"older store", [&] { UndoLastMigration(); }, "do: lookhaven init"},
         {"no manager", Sql("update users set privilege = 2 where name = 'admin'"), "no account may manage"},
         {"no live source", Sql("update cameras set live_profile = 2 where id = 1"), "camera 1 has no source"},
     };
