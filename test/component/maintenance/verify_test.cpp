@@ -273,5 +273,20 @@ TEST_F(VerifyTest, AFolderThatCannotBeReadEndsTheWorkOnItsMountAndLosesNothing) 
     EXPECT_FALSE(fs::exists(stray)) << "imported, with an id of its own";
 }
 
+TEST_F(VerifyTest, ASpanThatTheDiskDoesNotGiveIsNotWrittenAnew) {
+    for (const fs::path& folder : {folder_.Path(), footage_.Mount()}) {
+        fs::permissions(folder, fs::perms(0755));
+    }
+    for (const auto& entry : fs::recursive_directory_iterator(footage_.Mount())) {
+        fs::permissions(entry, entry.is_directory() ? fs::perms(0777) : fs::perms(0666));
+    }
+    fs::permissions(Span(), fs::perms::none);
+    const test::OrdinaryUser user;
+    const std::vector<Fault> faults = Verify(Records(), true).faults;
+    ASSERT_EQ(faults.size(), 1U);
+    EXPECT_THAT(faults.front().problem, HasSubstr("was not checked further: "));
+    EXPECT_EQ(faults.front().done, "");
+}
+
 }  // namespace
 }  // namespace lookhaven::maintenance
