@@ -13,6 +13,7 @@ from viewing import Load, serving_stand
 SECONDS = 60
 RATES = (50_000, 200_000, 500_000)  # bytes a second
 FAST_VIEWERS = 5
+TILES = 4  # of one page, on one connection
 BUFFERED_BYTES = 128 * 1024
 
 
@@ -26,13 +27,14 @@ def print_table(bin_folder, load, most_s):
         def watch(count, port, program):
             return viewers(bin_folder, count, SECONDS, ["--port", str(port), *cookie], program)
 
-        def watch_slowly(port, program, rate, is_reader):
-            return watch(1, lines.enter_context(Line(port, rate, is_reader)).port, program)
+        def watch_slowly(what, name, port, program, rate, count=1, is_reader=False):
+            slow_port = lines.enter_context(Line(port, rate, is_reader)).port
+            aim_s = most_s + (count * load.frame_bytes + BUFFERED_BYTES) / rate
+            return f"{what} {rate // 1000} kB/s", name, watch(count, slow_port, program), f"{aim_s:.2f}"
 
-        runs = [(f"{what} {rate // 1000} kB/s", name, watch_slowly(port, program, rate, is_reader),
-                 f"{most_s + (load.frame_bytes + BUFFERED_BYTES) / rate:.2f}")
-                for what, is_reader in (("has a line of", False), ("reads", True)) for name, port, program in ways
-                for rate in RATES]
+        runs = [watch_slowly("has a line of", *way, rate) for way in ways for rate in RATES]
+        runs += [watch_slowly("reads", *way, rate, is_reader=True) for way in ways for rate in RATES]
+        runs += [watch_slowly(f"has {TILES} tiles on a line of", *ways[1], rate, TILES) for rate in RATES]
         runs += [(f"{FAST_VIEWERS} beside, without a limit", name, watch(FAST_VIEWERS, port, program), "")
                  for name, port, program in ways]
         for viewer, name, run, aim in runs:

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/binding/slow_viewer.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <optional>
 #include <utility>
@@ -43,27 +44,40 @@ std::optional<int> AwaitDrained() {
     return static_cast<int>((until_us - base::MonotonicMicros()) / 1000);
 }
 
+std::int64_t AgeMs(const ring::Entry& entry) {
+    return base::WallMillis() - entry.CaptureMillis();
+}
+
 bool IsBehind(const ring::Entry& entry) {
-    return base::WallMillis() - entry.CaptureMillis() > kMaxBehindMs;
+    return AgeMs(entry) > kMaxBehindMs;
 }
 
 // How the muxed stream of this process stands.
 struct Lag {
-    bool has_begun = false;     // the group of pictures that it began with is over, or was caught up with
-    bool is_held_back = false;  // a slow connection kept it from the newest frame
+    std::int64_t max_behind_ms = 0;  // 0: the stream has not begun
+    bool is_held_back = false;       // a slow connection kept it from the newest frame
     bool is_skipping = false;
     bool is_sound_held_back = false;
     std::int64_t sound_us = 0;  // monotonic, when sound was last given out
 } g_lag;
 
+// The group that a stream begins with is sent even if that is old, and may become no older.
+void BeginLag(void* stream) {
+    const ring::Entry* key = ring::ReadLatestIFrame(stream);
+    g_lag.max_behind_ms = std::max(kMaxBehindMs, key == nullptr ? 0 : AgeMs(*key));
+    ring::ReadIFrameFinish(stream, key, nullptr);
+}
+
 // Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that
-// is not. The group that a stream begins with is sent whatever its age.
+// is not.
 bool IsSkipped(const ring::Entry& entry) {
     const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
-    const bool is_behind = IsBehind(entry);
-    g_lag.has_begun = g_lag.has_begun || is_key || !is_behind;
+    if (is_key || !IsBehind(entry)) {
+        g_lag.max_behind_ms = kMaxBehindMs;
+    }
+    const bool is_behind = AgeMs(entry) > g_lag.max_behind_ms;
     g_lag.is_held_back = g_lag.is_held_back && is_behind;
-    g_lag.is_skipping = (g_lag.is_skipping && !(is_key && !is_behind)) || (g_lag.is_held_back && g_lag.has_begun);
+    g_lag.is_skipping = (g_lag.is_skipping && !(is_key && !is_behind)) || g_lag.is_held_back;
     return g_lag.is_skipping;
 }
 
@@ -104,6 +118,9 @@ const ring::Entry* ReadNextSound(void* stream, int last_sequence, ring::Position
 
 const ring::Entry* ReadNextPicture(void* stream, int last_sequence, ring::Position* position,
                                    const ring::SecondReader* sound) {
+    if (g_lag.max_behind_ms == 0) {
+        BeginLag(stream);
+    }
     if (!IsDrained() && !(HasFreshKeyFrame(stream) && TakeOverduePicture())) {
         g_lag.is_held_back = true;
         return nullptr;

@@ -143,7 +143,7 @@ TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFr
     for (const std::int64_t age_ms : {5000, 4000, 3000, 1500, 1000}) {
         write_sound(age_ms);
     }
-    for (const auto& [key, age_ms] : {std::pair{false, 3000}, {true, 2500}, {false, 1500}}) {
+    for (const auto& [key, age_ms] : {std::pair{false, 3000}, {false, 4500}, {true, 2500}, {false, 1500}}) {
         write(key, age_ms);
     }
     EXPECT_EQ(next(0), 1) << "the group that it begins with is sent whatever its age";
@@ -154,14 +154,14 @@ TEST_F(SendQueueTest, AMuxedStreamThatASlowConnectionMadeLateGoesOnAtAFreshKeyFr
     EXPECT_EQ(next_sound(1), -1);
     while (recv(client_.Get(), block.data(), block.size(), MSG_DONTWAIT) > 0) {
     }
-    EXPECT_EQ(next(1), -1) << "one that is old, and one that needs it";
+    EXPECT_EQ(next(1), -1) << "one that has waited, one that is old, and one that needs it";
     EXPECT_EQ(next_sound(1), 4) << "the newest";
     EXPECT_EQ(next_sound(4), -1);
     write(true, 500);
     write(false, 400);
-    EXPECT_EQ(next(1), 4);
-    EXPECT_EQ(next(4), 5) << "and on from there, frame by frame";
-    EXPECT_EQ(next(5), -1);
+    EXPECT_EQ(next(1), 5);
+    EXPECT_EQ(next(5), 6) << "and on from there, frame by frame";
+    EXPECT_EQ(next(6), -1);
     RequestContext::Current().SetQueue(nullptr);
     stream->StopRead(&position);
     sound->StopRead(&sound_position);
