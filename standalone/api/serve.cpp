@@ -19,12 +19,12 @@
 #include "standalone/api/forward_target.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
+#include "standalone/api/read_call.h"
 #include "standalone/base/concat.h"
 #include "standalone/base/json_text.h"
 #include "standalone/base/log.h"
 #include "standalone/base/sanitizers.h"
 #include "standalone/binding/rights.h"
-#include "standalone/emap/map_picture.h"
 #include "standalone/http/body.h"
 #include "standalone/store/engine.h"
 #include "standalone/store/servers.h"
@@ -36,8 +36,6 @@ namespace {
 
 constexpr rlim_t kMaxAddressSpace = rlim_t{256} << 20;
 constexpr rlim_t kMaxAddressSpaceForPictures = rlim_t{1} << 30;
-constexpr std::size_t kMaxBody = std::size_t{1} << 20;
-constexpr const char* kManagersOnly = "only a manager may do this";
 constexpr const char* kStoreFailed = "the record store cannot be read; the server's log says why";
 constexpr const char* kStoreUnavailable = "the record store is not available; the server's log says why";
 
@@ -59,48 +57,6 @@ int PortIn(std::string_view text) {
 binding::TcpConnection ConnectionOf(const http::Request& request) {
     return {std::string(request.Header("SERVER_ADDR")), PortIn(request.Header("SERVER_PORT")),
             std::string(request.Header("PEER_ADDR")), PortIn(request.Header("PEER_PORT"))};
-}
-
-// Cookie and session come first: nobody without a session may cost more than a short request.
-Call ReadCall(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot) {
-    const bool is_forwarded = TakeForwarded(request, service.installation);
-    Call call{.request = request,
-              .api = {},
-              .method = {},
-              .parameters = ReadQuery(request),
-              .cookies = ReadCookies(request),
-              .login = {},
-              .is_forwarded = is_forwarded,
-              .context = binding::RequestContext::Current(),
-              .slots = slots,
-              .slot = slot,
-              .counters = service.counters};
-    call.login = FindLogin(call);
-    if (call.login) {
-        base::SetLogAccount(call.login->account);
-    }
-    const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
-    if (!call.login && body_bytes > http::kMaxBodyWithoutSession) {
-        throw SessionNeeded(call.Parameter("api") == kAuthApi.name);
-    }
-    const bool is_picture = IsPictureUpload(call);
-    if (is_picture && call.login && !call.login->is_manager) {
-        throw Failure(403, kManagersOnly);
-    }
-    if (body_bytes > (is_picture ? emap::kMaxUploadBytes : kMaxBody)) {
-        throw Failure(413, is_picture ? "the picture is larger than 20 MiB" : "the request body is larger than 1 MiB");
-    }
-    http::ReadBody(request, STDOUT_FILENO);
-    if (!is_picture) {
-        AddBody(request, call.parameters);
-    }
-    call.api = call.Parameter("api").asString();
-    call.version = call.Parameter("version").asInt();
-    call.method = call.Parameter("method").asString();
-    if (const Json::Value& camera = call.Parameter("camera"); camera.isInt()) {
-        base::SetLogCamera(camera.asInt());
-    }
-    return call;
 }
 
 // What decodes a picture must not find its sender's secret: others look at what it makes.
@@ -192,7 +148,7 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
     if (const std::string_view method = request.Header("REQUEST_METHOD"); method != "GET" && method != "POST") {
         throw Failure(405, "GET and POST only");
     }
-    Call call = ReadCall(service, request, slots, slot);
+    Call call = ReadCall(service.installation, service.counters, request, slots, slot);
     const OwnApi* own = FindOwnApi(call.api);
     const EntryFunction entry = own == nullptr ? service.modules.Find(call.api, call.version, call.method) : nullptr;
     if (own == nullptr && entry == nullptr) {
@@ -273,10 +229,6 @@ void PrepareProcess(const base::Installation& installation) try {
 bool MayBeLogIn(const http::Request& request) {
     return request.Header("REQUEST_METHOD") == "POST" &&
            request.Header("QUERY_STRING").find(base::Concat("api=", kAuthApi.name)) != std::string_view::npos;
-}
-
-http::Failure SessionNeeded(bool is_log_in) {
-    return {is_log_in ? 413 : 401, "log in first: without a session a body holds 4 KiB at most"};
 }
 
 bool NeedsCounters(const http::Request& request) {

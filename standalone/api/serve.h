@@ -39,9 +39,6 @@ bool NeedsCounters(const http::Request& request);
 // rate of POSTs that name this API.
 bool MayBeLogIn(const http::Request& request);
 
-// For a request without a session whose body holds more than kMaxBodyWithoutSession.
-http::Failure SessionNeeded(bool is_log_in);
-
 // Serves the request, whose body may be unread yet, on standard output, which is its connection, and shuts that down
 // for writing. Call it once in a process: it sets the process's request context. Never throws for a request's sake.
 void ServeRequest(const Service& service, http::Request& request, control::SlotTable& slots, control::Slot& slot);

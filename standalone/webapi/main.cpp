@@ -12,6 +12,7 @@
 
 #include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/modules.h"
+#include "standalone/api/read_call.h"
 #include "standalone/api/serve.h"
 #include "standalone/api/session_filter.h"
 #include "standalone/api/session_watcher.h"
