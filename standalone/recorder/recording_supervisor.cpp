@@ -31,6 +31,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
+      cameras_(installation),
       report_([&installation](const RecordingReport::States& states) {
           maintenance::WriteRecordingStatus(installation, states.cameras);
           maintenance::WriteMountStatus(installation, states.mounts);
@@ -50,18 +51,13 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                         });
                     }) {
     try {
-        for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
-            if (status.lost_since_s > 0) {
-                lost_since_s_.emplace(status.camera, status.lost_since_s);
-            }
-        }
         for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
             if (status.state == maintenance::MountState::kSpaceHeld) {
                 held_mounts_.insert(status.mount);
             }
         }
     } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot read how the recorder before left cameras and mounts: ") + failure.what());
+        base::LogWarning(std::string("cannot read how the recorder before left mounts: ") + failure.what());
     }
 }
 
@@ -153,43 +149,17 @@ void RecordingSupervisor::AnswerFlushes() {
     }
 }
 
-// A camera that is down is told so, whether anything is to be recorded of it or not.
-std::vector<maintenance::RecordingStatus>
-RecordingSupervisor::CameraStates(const std::map<int, CameraSignal>& signals) {
-    std::map<int, maintenance::RecordingStatus> states;
-    for (const auto& [camera, entry] : entries_) {
-        states.emplace(camera, entry.worker->State());
-    }
-    for (const auto& [camera, signal] : signals) {
-        maintenance::RecordingStatus& status = states[camera];
-        status.camera = camera;
-        status.camera_name = signal.camera_name;
-        if (signal.stream.codec) {
-            lost_since_s_.erase(camera);
-        } else if (!signal.stream.reason.empty()) {
-            status.lost_since_s = lost_since_s_.try_emplace(camera, base::WallSeconds()).first->second;
-            status.loss = signal.stream.loss;
-            status.loss_reason = signal.stream.reason;
-            if (status.state == maintenance::RecordingState::kReady) {
-                status.state = maintenance::RecordingState::kNoSignal;
-            }
-        }
-    }
-    std::vector<maintenance::RecordingStatus> list;
-    list.reserve(states.size());
-    for (const auto& [camera, status] : states) {
-        list.push_back(status);
-    }
-    return list;
-}
-
 void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
     if (hosts_) {
         hosts_->Ask(HasRoom());
     }
     missed_marks_.Ask();
-    RecordingReport::States states{CameraStates(signals), {}};
+    std::map<int, maintenance::RecordingStatus> recorded;
+    for (const auto& [camera, entry] : entries_) {
+        recorded.emplace(camera, entry.worker->State());
+    }
+    RecordingReport::States states{cameras_.Combine(std::move(recorded), signals), {}};
     for (const auto& [id, mount] : mounts_) {
         mount->Ask();
         states.mounts.push_back(mount->Status());

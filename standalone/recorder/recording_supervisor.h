@@ -14,6 +14,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/control/stream_counters.h"
+#include "standalone/recorder/camera_states.h"
 #include "standalone/recorder/host_cameras.h"
 #include "standalone/recorder/mount_maintenance.h"
 #include "standalone/recorder/recording_report.h"
@@ -23,13 +24,6 @@ namespace lookhaven::recorder {
 
 // How long a host's heartbeat stands still until others take its cameras over.
 constexpr std::chrono::milliseconds kHostOfflineLimit{30'000};
-
-// What comes from a camera: from the stream that is recorded, else from one that fails, if any does.
-struct CameraSignal {
-    std::string camera_name;
-    bool is_recorded = false;
-    StreamSignal stream;
-};
 
 class RecordingSupervisor {
   public:
@@ -65,7 +59,6 @@ class RecordingSupervisor {
     void AnswerFlushes();
     void ReconcileMounts(const CatalogContents& catalog);
     bool HasRoom() const;
-    std::vector<maintenance::RecordingStatus> CameraStates(const std::map<int, CameraSignal>& signals);
     bool FootageHasEnded(const store::Mark& mark) const;
     bool IsHeldElsewhere(int camera) const;
     template <class Work>
@@ -74,6 +67,7 @@ class RecordingSupervisor {
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
+    CameraStates cameras_;
     RecordingReport report_;
     EventRowQueue rows_;
     std::unique_ptr<HostCameras> hosts_;  // null on a single machine
@@ -82,8 +76,7 @@ class RecordingSupervisor {
     std::atomic<bool> are_mounts_recovered_ = false;
     std::map<std::string, std::string> reported_failures_;
     std::map<int, Entry> entries_;
-    std::map<int, std::int64_t> lost_since_s_;                 // by camera; what an earlier recorder noticed included
-    std::set<int> held_mounts_;                                // whose space did not come back, at the start
+    std::set<int> held_mounts_;                                // mounts whose space did not come back, at the start
     std::map<int, std::unique_ptr<MountMaintenance>> mounts_;  // by id
     StoreThread missed_marks_;
     bool stores_last_rows_ = false;
