@@ -8,12 +8,12 @@
 #include "standalone/admin/devices.h"
 #include "standalone/admin/hosts.h"
 #include "standalone/base/codec_words.h"
+#include "standalone/cli/camera_data.h"
 #include "standalone/cli/camera_options.h"
 #include "standalone/cli/camera_state.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_hours.h"
 #include "standalone/cli/recording_options.h"
-#include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/store/devices.h"
@@ -39,43 +39,6 @@ struct Request {
     CameraOptions options;
     RecordingOptions recording;
 };
-
-Json::Value ToData(const Camera& camera, const RecordingPlan& plan) {
-    Json::Value data =
-        Object("id", camera.id, "name", camera.name, "enabled", camera.enabled, "video_type",
-               static_cast<int>(camera.video_type), "live_profile", camera.live_profile, "ptz", camera.ptz, "audio",
-               camera.audio, "insecure", camera.insecure, "recording", PlanData(plan));
-    if (camera.host_id != 0) {
-        data["host"] = camera.host_id;
-    }
-    for (const store::CameraProfile& profile : camera.profiles) {
-        data["profiles"].append(Object("number", profile.number, "source", profile.source, "width", profile.width,
-                                       "height", profile.height, "fps", profile.fps));
-    }
-    return data;
-}
-
-std::string FeaturesText(const Json::Value& camera) {
-    return std::string(camera["ptz"].asBool() ? "PTZ " : "") + (camera["audio"].asBool() ? "audio " : "") +
-           (camera["insecure"].asBool() ? "insecure" : "");
-}
-
-std::string LiveSourceText(const Json::Value& camera) {
-    for (const Json::Value& profile : camera["profiles"]) {
-        if (profile["number"] == camera["live_profile"]) {
-            return profile["source"].asString();
-        }
-    }
-    return "none";
-}
-
-constexpr Column kColumns[] = {{"id", "id"},
-                               {"name", "name"},
-                               {"state", "", CameraStateText},
-                               {"video", "video_type", VideoTypeText},
-                               {"features", "", FeaturesText},
-                               {"recorded", "recording.mode"},
-                               {"live source", "", LiveSourceText}};
 
 Camera RequireCamera(Cameras& cameras, int id) {
     return Require(cameras.Find(id), "there is no camera ", id, ": see lookhaven camera list");
@@ -143,7 +106,7 @@ void Add(const Console& console, const Request& request) {
         ProbeMissing(camera, request);
         ApplyPlan(camera, request);
     });
-    console.Answer(ToData(setup.camera, setup.plan.value_or(store::NoPlan())), "Added camera ", setup.camera.name,
+    console.Answer(CameraData(setup.camera, setup.plan.value_or(store::NoPlan())), "Added camera ", setup.camera.name,
                    " with id ", setup.camera.id, "; it sends ", base::CodecTitle(setup.camera.video_type), ".");
 }
 
@@ -161,7 +124,7 @@ void Edit(admin::CameraSetup& setup, const Request& request) {
         ProbeMissing(setup, request);
     }
     if (!has_new_source && !request.options.HasAudio()) {
-        camera.audio = before.audio;  // the owner's choice
+        camera.audio = before.audio;  // the operator's choice
     }
     ApplyPlan(setup, request);
 }
@@ -175,7 +138,7 @@ void Change(const Console& console, const Request& request) {
                                                           ApplyHost(store, camera.camera, request);
                                                           Edit(camera, request);
                                                       });
-    console.Answer(ToData(setup.camera, setup.plan.value_or(store::NoPlan())), "Changed camera ", request.id, ".");
+    console.Answer(CameraData(setup.camera, setup.plan.value_or(store::NoPlan())), "Changed camera ", request.id, ".");
 }
 
 void List(const Console& console) {
@@ -185,9 +148,9 @@ void List(const Console& console) {
     Json::Value data = Json::arrayValue;
     for (const Camera& camera : Cameras(store).List()) {
         const auto plan = plans.find(camera.id);
-        states.AddTo(data.append(ToData(camera, plan == plans.end() ? store::NoPlan() : plan->second)));
+        states.AddTo(data.append(CameraData(camera, plan == plans.end() ? store::NoPlan() : plan->second)));
     }
-    console.Answer(data, Table(kColumns, data));
+    console.Answer(data, CameraTable(data));
 }
 
 void Remove(const Console& console, const Request& request) {
