@@ -14,8 +14,8 @@
 #include "standalone/base/process.h"
 #include "standalone/base/version.h"
 #include "standalone/control/common_config.h"
-#include "standalone/doctor/apart.h"
 #include "standalone/doctor/checks.h"
+#include "standalone/doctor/isolated_jobs.h"
 #include "standalone/store/store.h"
 
 namespace lookhaven::api {
@@ -92,7 +92,7 @@ Json::Value SystemStatus(const Call& call) {
     // The checks say what is wrong with one that cannot be read.
     jobs.emplace_back([&] { return base::OneLineJson(admin::CurrentCertificate(installation)); });
     call.context.CloseRecords();  // it must not be shared with other processes
-    std::vector<doctor::JobResult> results = doctor::RunApart(jobs, kLimit);
+    std::vector<doctor::JobResult> results = doctor::RunIsolated(jobs, kLimit);
     data["certificate"] = base::ParseOneLineJson(results.back().text);
     data["check"] = Json::arrayValue;
     for (std::size_t i = 0; i < doctor::Checks().size(); ++i) {

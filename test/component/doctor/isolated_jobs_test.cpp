@@ -2,7 +2,7 @@
 //
 // Jobs in processes of their own: one that hangs or dies harms neither its caller nor the others, and leaves no
 // process.
-#include "standalone/doctor/apart.h"
+#include "standalone/doctor/isolated_jobs.h"
 
 #include <array>
 #include <stdexcept>
@@ -47,7 +47,7 @@ class EndOfProcesses {
     base::FileDescriptor input_;
 };
 
-TEST(Apart, EachJobFailsForItself) {
+TEST(IsolatedJobs, EachJobFailsForItself) {
     const std::string large(3'000'000, 'x');
     const struct {
         const char* name;
@@ -69,7 +69,7 @@ TEST(Apart, EachJobFailsForItself) {
         jobs.push_back(row.job);
     }
     EndOfProcesses end;
-    const std::vector<JobResult> results = RunApart(jobs, kLimit);
+    const std::vector<JobResult> results = RunIsolated(jobs, kLimit);
     ASSERT_EQ(results.size(), std::size(rows));
     for (std::size_t i = 0; i < results.size(); ++i) {
         EXPECT_EQ(results[i].state, rows[i].state) << rows[i].name;
@@ -78,11 +78,11 @@ TEST(Apart, EachJobFailsForItself) {
     EXPECT_TRUE(end.Comes()) << "a process is left";
 }
 
-TEST(Apart, NoneOutlivesItsCaller) {
+TEST(IsolatedJobs, NoneOutlivesItsCaller) {
     EndOfProcesses end;
     const int status = test::WaitFor(test::InChild([] {
         const std::array<Job, 2> jobs = {Hang, [] { return ::kill(::getppid(), SIGKILL), Hang(); }};
-        RunApart(jobs, std::chrono::hours(1));
+        RunIsolated(jobs, std::chrono::hours(1));
     }));
     EXPECT_TRUE(WIFSIGNALED(status));
     EXPECT_TRUE(end.Comes());

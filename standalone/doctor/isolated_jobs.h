@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Runs what may block for ever, or crash, without its caller doing either.
+// Runs jobs that may block for ever or crash, each in a process of its own, so that the caller does neither.
 //
-// Why so        A disk or a file system of the network that hangs blocks whoever looks at it, and no signal helps. A
-//               request must be answered all the same, and what else was looked at be told.
+// Why so        A disk or network file system that hangs blocks any process that accesses it, and no signal helps. A
+//               request must be answered all the same, with the results of the other jobs.
 #pragma once
 
 #include <chrono>
@@ -28,6 +28,6 @@ struct JobResult {
 // The results in the order of the jobs. These run at the same time, each in a process of its own, which has a copy of
 // what the caller has and is killed at the limit, or when the caller ends. The caller must have one thread and no open
 // store. Takes hardly longer than the limit, whatever the jobs do.
-std::vector<JobResult> RunApart(std::span<const Job> jobs, std::chrono::milliseconds limit);
+std::vector<JobResult> RunIsolated(std::span<const Job> jobs, std::chrono::milliseconds limit);
 
 }  // namespace lookhaven::doctor

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/doctor/apart.h"
+#include "standalone/doctor/isolated_jobs.h"
 
 #include <algorithm>
 #include <array>
@@ -118,7 +118,7 @@ bool WaitAndRead(std::vector<Child>& children, std::int64_t until_us) {
 
 }  // namespace
 
-std::vector<JobResult> RunApart(std::span<const Job> jobs, std::chrono::milliseconds limit) {
+std::vector<JobResult> RunIsolated(std::span<const Job> jobs, std::chrono::milliseconds limit) {
     const std::int64_t until_us = base::MonotonicMicros() + limit.count() * 1000;
     const pid_t parent = ::getpid();
     std::vector<Child> children;
