@@ -122,7 +122,7 @@ TEST_F(FileTest, TwoMappingsOfOneFileAreTheSameMemory) {
     EXPECT_THROW(SharedMapping(path_ / "link", 4096), std::system_error);
 }
 
-TEST_F(FileTest, WhichHostAnInstallationIsIsReadAsWrittenOrNotAtAll) {
+TEST_F(FileTest, TheHostFileIsReadAsWrittenOrRefused) {
     Installation::CreateFolders(path_ / "home");
     const Installation installation(path_ / "home");
     EXPECT_EQ(installation.HostId(), 0);
@@ -274,7 +274,7 @@ TEST(ClockTest, ABootHasOneIdWhoeverTellsIt) {
     EXPECT_EQ(boot.size(), 32U) << boot;
     EXPECT_EQ(TimeSinceBoot().boot, boot);
     ::setenv("LOOKHAVEN_BOOT_ID", boot.c_str(), 1);
-    EXPECT_EQ(BootId(), boot) << "as systemd tells it";
+    EXPECT_EQ(BootId(), boot) << "as systemd gives it, without the hyphens of /proc";
     ::setenv("LOOKHAVEN_BOOT_ID", std::string(32, '0').c_str(), 1);
     EXPECT_EQ(TimeSinceBoot().boot, std::string(32, '0')) << "whatever /proc says";
     ::unsetenv("LOOKHAVEN_BOOT_ID");
