@@ -213,6 +213,9 @@ std::string Outline(const Call& call) {
     data["camera"] = Json::arrayValue;
     for (const int camera : CamerasOf(call)) {
         const store::Outline outline = store::OutlineOf(call.Records(), camera, begin_s, end_s, step_s);
+        if (outline.IsEmpty()) {
+            continue;  // as a camera that the caller may not see, or that there is not
+        }
         Json::Value& json = data["camera"].append(Json::objectValue);
         json["camera_id"] = camera;
         json["continuous"] = BarsOf(outline.continuous);

@@ -43,6 +43,8 @@ struct Outline {
     std::vector<Bar> alarm;                  // … and for any other reason
     std::vector<std::int64_t> alerts;        // when they happened, in seconds; at most one for each step
     std::vector<std::int64_t> transactions;  // of POS terminals, likewise
+
+    bool IsEmpty() const { return continuous.empty() && alarm.empty() && alerts.empty() && transactions.empty(); }
 };
 
 // Of the events and marks that touch the span from begin_s up to, not including, end_s. step_s: at least 1. Reads each

@@ -69,15 +69,18 @@ export class FootageCache {
     const key = `${camera} ${first} ${last}`;
     const kept = this.#merged.get(key);
     if (kept?.version === this.#version) return kept;
-    const footage = new Map<string, Footage>();
+    const footage: Footage[] = [];
     const segments: Segment[] = [];
-    for (let start = first; start <= last; start += kSpanS) {
+    for (let start = first, before: Span | undefined; start <= last; start += kSpanS) {
       const span = this.#spans.get(keyOf(camera, start));
-      for (const one of [...(span?.events ?? []), ...(span?.marks ?? [])]) footage.set(`${one.kind}${one.id}`, one);
+      // What began in the span before is there already.
+      const isNew = (one: Footage) => !before || one.start >= start;
+      if (span) footage.push(...span.events.filter(isNew), ...span.marks.filter(isNew));
       for (const segment of span?.segments ?? []) addSegment(segments, segment);
+      before = span;
     }
-    const sorted = [...footage.values()].sort((one, other) => one.start - other.start || one.id - other.id);
-    const answer = { version: this.#version, footage: sorted, segments };
+    footage.sort((one, other) => one.start - other.start || one.id - other.id);
+    const answer = { version: this.#version, footage, segments };
     if (this.#merged.size > 256) this.#merged.clear();
     this.#merged.set(key, answer);
     return answer;

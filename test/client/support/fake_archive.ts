@@ -164,10 +164,9 @@ export class FakeArchive {
 
   #history(camera: number, from: number, to: number, interval: number) {
     const events = this.#overlapping(camera, from, to, false);
-    const steps = Array.from({ length: Math.ceil((to - from) / interval) }, (_, step) => {
-      const at = from + step * interval;
-      return events.some(({ start, stop }) => start < at + interval && stop > at) ? 2 : 0;
-    });
+    const steps = new Array<number>(Math.ceil((to - from) / interval)).fill(0);
+    const stepOf = (at: number) => (at - from) / interval;
+    for (const { start, stop } of events) steps.fill(2, Math.max(0, Math.floor(stepOf(start))), Math.ceil(stepOf(stop)));
     const runs: [number, number][] = [];
     for (const value of steps) {
       if (runs.at(-1)?.[0] === value) runs.at(-1)![1] += 1;

@@ -44,6 +44,7 @@ export class Overview {
   readonly #actions: OverviewActions;
   #cameras: readonly Camera[] = [];
   #onStage: readonly number[] = [];
+  /** While the timeline is being moved. */
   #debounce: ReturnType<typeof setTimeout> | undefined;
 
   constructor(recordings: Recordings, preferences: Preferences, actions: OverviewActions) {
@@ -160,7 +161,10 @@ export class Overview {
     const { startMs, endMs } = this.timeline.scale;
     if (this.timeline.showsEvents) this.calendar.select((startMs + Math.min(endMs, Date.now())) / 2);
     clearTimeout(this.#debounce);
-    this.#debounce = setTimeout(() => this.reload(), kDebounceMs);
+    this.#debounce = setTimeout(() => {
+      this.#debounce = undefined;
+      this.reload();
+    }, kDebounceMs);
     this.#actions.moved();
   }
 
@@ -171,6 +175,8 @@ export class Overview {
 
   #showFootage(): void {
     this.timeline.redraw();
+    // Listed when it has come to rest: thousands of events take longer than a frame.
+    if (this.#debounce !== undefined) return;
     if (this.#search.isActive) return this.list.show(this.#search.found.map(rowOf), this.#search.head, this.#search.note);
     const { startMs, endMs } = this.timeline.scale;
     const span = spanText(startMs, Math.min(endMs, Date.now()));

@@ -94,6 +94,7 @@ export class EventsScreen extends Screen {
   };
   /** Why there is no list of cameras; empty when there is. */
   #error = "";
+  #isListed = false;
 
   constructor(session: Session) {
     super("events", session);
@@ -172,6 +173,7 @@ export class EventsScreen extends Screen {
     };
     const list = await keepTrying(() => this.server.cameras(), failed, this.closed);
     if (!list) return;
+    this.#isListed = true;
     this.#overview.cameras = list.camera ?? [];
     this.#stage.setCameras(this.#overview.cameras);
     this.#error = "";
@@ -210,8 +212,8 @@ export class EventsScreen extends Screen {
     this.#address.record();
     const { cache, outline, cameras, timeline } = this.#overview;
     const error = this.#error || (timeline.showsEvents ? cache : outline).error;
-    const empty = cameras.length === 0 && this.progress.hidden ? "No cameras" : "";
-    this.progress.hidden = !cache.isBusy && !outline.isBusy && (cameras.length > 0 || error !== "");
+    const empty = this.#isListed && cameras.length === 0 ? "No cameras" : "";
+    this.progress.hidden = !cache.isBusy && !outline.isBusy && (this.#isListed || error !== "");
     setText(this.#status, error || empty);
     this.#status.classList.toggle("alarm", error !== "");
   }

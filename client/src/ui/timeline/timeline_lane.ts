@@ -3,13 +3,15 @@
 // Paints a camera's lane of the timeline: coverage, events and marks.
 //
 // Why so        Ten thousand events are more than a screen has pixels in a row. Bars that would fall into the pixel of
-//               the one before are skipped, and each colour is filled once, so that dragging is smooth.
+//               the one before are skipped, and those that touch are painted as one, so that dragging is smooth.
 
 import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
 import type { Footage, FootageKind, FootageRef } from "../../wire/footage";
 import type { LaneOutline } from "../../wire/recordings";
 import type { TimeScale } from "./time_scale";
 import type { Colours } from "./timeline_drawing";
+
+type Span = readonly [startS: number, stopS: number];
 
 /** What is drawn in a lane. */
 export interface LaneContent {
@@ -49,15 +51,18 @@ export function paintLane(
   const barTop = topPx + Math.round(heightPx * 0.3);
   const barPx = Math.round(heightPx * 0.42);
   if (lane.outline) paintOutline(context, scale, colours, lane.outline, topPx, barTop, barPx);
-  const strip = (segment: Segment) => [segment.startS, segment.stopS] as const;
-  paintBars(context, scale, lane.segments.map(strip), barTop, barPx, kRecorded);
+  paintBars(context, scale, lane.segments.map(({ startS, stopS }) => [startS, stopS]), barTop, barPx, kRecorded);
   const shown = overlapping(lane.footage, scale.startMs / 1000, scale.endMs / 1000);
-  const marks = shown.filter(({ kind }) => kind !== "event");
-  const bars = (kind: EventKind) => shown.filter((one) => kindOf(one) === kind).map((one) => [one.start, one.stop] as const);
-  paintBars(context, scale, bars("continuous"), barTop, barPx, kContinuous);
-  const chosen = shown.find((one) => one.kind === selected?.kind && one.id === selected.id);
-  if (chosen) paintBars(context, scale, [[chosen.start, chosen.stop]], barTop, barPx, kSelected);
-  paintBars(context, scale, bars("alarm"), barTop, barPx, colours.accent);
+  const [continuous, alarm, chosen]: [Span[], Span[], Span[]] = [[], [], []];
+  const marks: Footage[] = [];
+  for (const one of shown) {
+    if (one.kind !== "event") marks.push(one);
+    else (kindOf(one) === "continuous" ? continuous : alarm).push([one.start, one.stop]);
+    if (one.kind === selected?.kind && one.id === selected.id) chosen.push([one.start, one.stop]);
+  }
+  paintBars(context, scale, continuous, barTop, barPx, kContinuous);
+  paintBars(context, scale, chosen, barTop, barPx, kSelected);
+  paintBars(context, scale, alarm, barTop, barPx, colours.accent);
   paintGrowing(context, scale, shown, barTop, barPx, colours);
   for (const mark of marks) paintMark(context, scale, mark, topPx, barTop, colours, mark.id === selected?.id);
   paintTexts(context, scale, marks, topPx, colours);
@@ -85,26 +90,30 @@ function paintOutline(
 function paintBars(
   context: CanvasRenderingContext2D,
   scale: TimeScale,
-  spans: readonly (readonly [startS: number, stopS: number])[],
+  spans: readonly Span[],
   topPx: number,
   heightPx: number,
   colour: string,
 ): void {
   context.fillStyle = colour;
-  context.beginPath();
-  let paintedPx = -1;
+  const run = { from: 0, to: -3 };
+  const paint = () => run.to > run.from && context.fillRect(run.from, topPx, run.to - run.from, heightPx);
   for (const [startS, stopS] of spans) {
     const from = Math.max(-2, scale.xOf(startS * 1000));
     const to = Math.min(scale.widthPx + 2, scale.xOf(stopS * 1000));
-    if (to < 0 || from > scale.widthPx || to <= paintedPx) continue;
+    if (to < 0 || from > scale.widthPx || to <= run.to) continue;
     // A hairline between two recordings, where there is room for one.
     const gap = to - from >= kMinSinglePx ? Math.min(1, (to - from) / 4) : 0;
-    const left = Math.max(from, paintedPx);
+    const left = Math.max(from, run.to);
     const right = Math.max(to - gap, left + 1);
-    context.rect(left, topPx, right - left, heightPx);
-    paintedPx = right + gap;
+    if (left === run.to && gap === 0) {
+      run.to = right;
+      continue;
+    }
+    paint();
+    Object.assign(run, { from: left, to: right });
   }
-  context.fill();
+  paint();
 }
 
 /** What is still being recorded has an open end. */
