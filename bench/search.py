@@ -4,8 +4,6 @@
 Stores of 10,000 and of 1,000,000 events get the same further ones, long before all others: three days of 10, 100 and 1,000
 events for each of eight cameras, and a month of two events a day for each of 64. The same questions about these must cost
 the same in both stores. What SQLite itself needs to make JSON of the same rows stands beside it.
-
-With the further argument "texts": words in a million texts of alerts and POS transactions instead.
 """
 
 import json
@@ -32,54 +30,8 @@ NOW = int(time.time()) // DAY * DAY
 DENSE_DAYS = {count: NOW - (2000 + number) * DAY for number, count in enumerate((10, 100, 1000))}
 OLD_MONTH = NOW - 2100 * DAY
 DENSE_CAMERAS = 8
-
-
-TEXTS = 1_000_000
-WORDS = {"a word of every text": "total", "a word of one in a thousand": "item7", "a word of one in a million": "receipt77",
-         "two words, one of one camera": "total counter3", "no such word": "nothing"}
-MARK_COLUMNS = "id kind camera_id moment_s start_s end_s text state mount_id path demo".split()
-
-
-def texts():
-    """Receipts, one a minute, of all cameras in turn."""
-    for number in range(TEXTS):
-        camera, start = 1 + number % CAMERAS, NOW - (TEXTS - number) * 60
-        text = f"counter{camera} receipt{number} item{number % 1000} total {number % 97}.{number % 89:02}"
-        yield 10_000_000 + number, 2, camera, start + 5, start, start + 15, text, 2, 0, "", 1
-
-
-def plant_texts(database):
-    with sqlite3.connect(database) as connection:
-        marks = ", ".join("?" * len(MARK_COLUMNS))
-        connection.executemany(f"insert into marks ({', '.join(MARK_COLUMNS)}) values ({marks})", texts())
-    connection.close()
-
-
-def measure_texts(bin_folder, store=None, plant=None):
-    """The newest 100 of a million texts with each of the words, of all cameras and of one in eight."""
-    with Stand(bin_folder, store) as stand:
-        for number in range(CAMERAS):
-            stand.add_test_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
-        if plant is not None:
-            plant()
-        else:
-            plant_texts(stand.database)
-        stand.start_host()
-        stand.start_nginx()
-        cookie = stand.log_in()
-        for name, words in WORDS.items():
-            for some, cameras in ("all", 1), ("8", 8):
-                ids = ",".join(str(camera) for camera in range(1, CAMERAS + 1, cameras))
-                query = f"api=VEXO.Event&version=1&method=List&limit=100&cameralists={ids}&text=" + words.replace(" ", "+")
-                yield f"{name}, {some} cameras", *ask(bin_folder, stand, cookie, query)
-
-
-def print_texts(engine, rows):
-    print(f"| {engine}, a million texts | p50 ms | p99 ms |")
-    print("|---|---|---|")
-    for name, p50, p99 in rows:
-        print(f"| {name} | {p50:.1f} | {p99:.1f} |", flush=True)
-    print()
+# Of times that have more events in the larger store.
+DIFFERENT = ("days of a month, 64 cameras", "outline of 90 days, 64 cameras")
 
 
 def planted_rows(first_id):
@@ -107,6 +59,8 @@ def questions():
     dates = f"{API}&method=SearchAvaiDate&day_count=31&cameralists={cameras}&start="
     yield "days of a month, 64 cameras", dates + str(NOW - 400 * DAY), None
     yield "days of the old month, 64 cameras", dates + str(OLD_MONTH), None
+    quarter = f"from={NOW - 130 * DAY}&to={NOW - 40 * DAY}&step=3600"
+    yield "outline of 90 days, 64 cameras", f"api=VEXO.Event&version=1&method=Outline&{quarter}&cameralists={cameras}", None
     for count, day in DENSE_DAYS.items():
         eight = ",".join(str(camera) for camera in range(1, DENSE_CAMERAS + 1))
         query = f"{API}&method=EnumEvent&from={day}&to={day + DAY}&interval=60&recording=true&cameralists={eight}"
@@ -173,20 +127,13 @@ def print_table(engine, small, large):
     for name, (p50, p99, bare) in large.items():
         of_bare = f"{bare:.1f} | {p50 / bare:.2f}" if bare else "– | –"
         other = small[name][0]
-        same = "–" if name == "days of a month, 64 cameras" else f"{p50 / other:.2f}"
+        same = "–" if name in DIFFERENT else f"{p50 / other:.2f}"
         print(f"| {name} | {p50:.1f} | {p99:.1f} | {of_bare} | {other:.1f} | {same} |")
     print(flush=True)
 
 
 def main():
     bin_folder = pathlib.Path(sys.argv[1])
-    if "texts" in sys.argv[2:]:
-        print_texts("SQLite", measure_texts(bin_folder))
-        with Postgres() as server:
-            address = server.new_database("texts")
-            print_texts("PostgreSQL", measure_texts(
-                bin_folder, address, lambda: server.copy("texts", "marks", MARK_COLUMNS, texts())))
-        return
     print_table("SQLite", *(measure(bin_folder, size) for size in SIZES))
     with Postgres() as server:
         answers = []

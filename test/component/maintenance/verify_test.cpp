@@ -189,7 +189,7 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("imported"));
     EXPECT_FALSE(fs::exists(foreign));
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
-    // A number that a restored store gave out anew, and one whose row a recorder may still have in memory.
+    // A number that a restored store gave out again, and one whose row a recorder may still have in memory.
     store::Events events(Records());
     const fs::path taken = file_.parent_path() / ("125000-" + std::to_string(event_) + ".mkv");
     const int reserved = events.NextIds(2);
