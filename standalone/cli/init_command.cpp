@@ -13,6 +13,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/doctor/checks.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/users.h"
@@ -117,6 +118,15 @@ void RenewMarkers(store::Store& store) {
     }
 }
 
+// Without which this host's maps go on showing them here.
+void SharePictures(store::Store& store, const base::Installation& installation) {
+    try {
+        emap::Pictures(store, installation.Home()).Share();
+    } catch (const store::StoreError& error) {
+        base::LogError(Concat("other hosts lack pictures of e-maps: ", error.what()));
+    }
+}
+
 // Without room for it the upgrade goes on all the same: cameras wait to be recorded.
 void CopyOlderStore(const base::Installation& installation) {
     try {
@@ -148,6 +158,7 @@ void Init(const Console& console, const Request& request) {
     store::Store store = store::Store::Open(installation.StoreUrl());
     const bool mount_added = AddDefaultMount(store, installation, console);
     RenewMarkers(store);
+    SharePictures(store, installation);
     const bool admin_added = !admin.empty() && AddAdmin(store, admin);
     const std::string home = installation.Home().string();
     std::string text = "The state folder " + home + " is ready.";

@@ -10,7 +10,9 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
 #include "standalone/base/io.h"
+#include "standalone/base/log.h"
 #include "standalone/base/text.h"
+#include "standalone/store/emap_pictures.h"
 #include "standalone/store/secret.h"
 
 namespace lookhaven::emap {
@@ -21,6 +23,7 @@ namespace fs = std::filesystem;
 using namespace std::string_view_literals;
 
 constexpr auto kMinUnusedAge = std::chrono::minutes(1);
+constexpr std::int64_t kMinUnusedSecondsInStore = 600;
 
 // Removes spaces, comments and processing instructions; false when one does not end.
 bool SkipProlog(std::string_view& text) {
@@ -96,6 +99,9 @@ std::string Pictures::Write(std::string_view bytes) {
     const std::string name = std::to_string(base::WallSeconds()) + "-" + store::RandomHex(8) + "." + std::string(type);
     fs::create_directories(folder_);
     base::WriteFileAtomically(folder_ / name, bytes);
+    if (!store_.IsSqlite()) {
+        store::EmapPictures(store_).Put(name, bytes, base::WallSeconds());
+    }
     return name;
 }
 
@@ -103,6 +109,7 @@ void Pictures::Withdraw(const std::string& name) {
     if (IsPictureName(name) && !Used().contains(name)) {
         std::error_code ignored;
         fs::remove(folder_ / name, ignored);
+        store::EmapPictures(store_).Withdraw(name);
     }
 }
 
@@ -110,6 +117,7 @@ void Pictures::Touch(const std::string& name) {
     if (IsPictureName(name)) {
         std::error_code ignored;
         fs::last_write_time(folder_ / name, fs::file_time_type::clock::now(), ignored);
+        store::EmapPictures(store_).Touch(name, base::WallSeconds());
     }
 }
 
@@ -132,12 +140,43 @@ void Pictures::Sweep() {
             fs::remove(file.path(), error);
         }
     }
+    store::EmapPictures(store_).RemoveUnused(base::WallSeconds() - kMinUnusedSecondsInStore);
+}
+
+void Pictures::Share() {
+    if (store_.IsSqlite()) {
+        return;
+    }
+    store::EmapPictures shared(store_);
+    for (const std::string& name : shared.Missing()) {
+        try {
+            if (IsPictureName(name)) {
+                shared.Put(name, ReadFile(name), base::WallSeconds());
+            }
+        } catch (const std::system_error& error) {
+            if (error.code() != std::errc::no_such_file_or_directory) {
+                base::LogWarning(std::string("other hosts lack a picture of an e-map: ") + error.what());
+            }
+        }
+    }
 }
 
 std::string Pictures::Read(const std::string& name) const {
     if (!IsPictureName(name)) {
         throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is not a picture of an e-map");
     }
+    try {
+        return ReadFile(name);
+    } catch (const std::system_error&) {
+        std::optional<std::string> shared = store::EmapPictures(store_).Find(name);
+        if (!shared) {
+            throw;
+        }
+        return *std::move(shared);
+    }
+}
+
+std::string Pictures::ReadFile(const std::string& name) const {
     const fs::path path = folder_ / name;
     const base::FileDescriptor file = base::OpenFile(path, O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
     struct stat about {};

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The picture files of e-maps, in the folder "emaps" of the state folder.
+// The picture files of e-maps, in the folder "emaps" of the state folder; where several hosts may share the store, it
+// has the pictures too, for the hosts that have not the files.
 //
 // Why so        A picture is untrusted input: its type is learned from what it holds, its file is named by
 //               us, and a name out of the store opens no file elsewhere. The file is complete on disk before a map
@@ -33,20 +34,27 @@ class Pictures {
 
     // Writes a picture that no map has yet, and returns its file's name for store::Emaps::SetImage. Waits for the disk:
     // call it before the store is locked. Throws store::InvalidRecord for what is no picture or larger than
-    // kMaxPictureBytes, std::system_error when it cannot be written.
+    // kMaxPictureBytes, std::system_error when the file cannot be written.
     std::string Write(std::string_view bytes);
     // Removes what Write has just written unless a map has it by now.
     void Withdraw(const std::string& name);
-    // Before a map loses its picture: Sweep spares the file for a minute, for who has read the map's row just now.
+    // Before a map loses its picture: Sweep spares it for a minute, for who has read the map's row just now.
     void Touch(const std::string& name);
 
-    // Removes files that no map names, a minute after they were written or touched.
+    // Removes files that no map names, a minute after they were written or touched, and what the store has of them ten
+    // minutes after, since the clocks of hosts differ.
     void Sweep();
 
-    // The file's bytes. Throws std::system_error when there is none, also for a name that is none of ours.
+    // Puts what the store lacks of this host's files into it, where several hosts may share it: from before it was one
+    // of theirs.
+    void Share();
+
+    // The file's bytes, or the store's. Throws std::system_error when neither is there, also for a name that is none of
+    // ours.
     std::string Read(const std::string& name) const;
 
   private:
+    std::string ReadFile(const std::string& name) const;
     std::set<std::string> Used();
 
     store::Store& store_;

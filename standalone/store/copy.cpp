@@ -26,6 +26,7 @@ constexpr std::array<std::string_view, 4> kNotCopied = {"schema_version", "recor
 // PostgreSQL's client takes in all rows of an answer.
 constexpr const char* kOpenCursor = "declare copied no scroll cursor for select * from ";
 constexpr const char* kFetchFromCursor = "fetch 1000 from copied";
+constexpr const char* kFetchLargeFromCursor = "fetch 1 from copied";  // a row of megabytes
 constexpr const char* kCloseCursor = "close copied";
 
 // In the order in which they were created, so that what refers to a row comes after it.
@@ -156,12 +157,21 @@ std::int64_t CopyTable(Connection& source, soci::session& from, soci::session& t
     from << kOpenCursor + table;
     std::int64_t all = 0;
     std::int64_t rows = 0;
+    const char* const fetch = table == "emap_pictures" ? kFetchLargeFromCursor : kFetchFromCursor;
     do {
-        rows = Visit(from, kFetchFromCursor, insert);
+        rows = Visit(from, fetch, insert);
         all += rows;
     } while (rows > 0);
     from << kCloseCursor;
     return all;
+}
+
+// A newer program may have added tables and columns that would be left out.
+void RequireKnown(soci::session& sql) {
+    if (FetchOne<int>(sql, "select version from schema_version") != Store::SchemaVersion()) {
+        throw SchemaError("a newer program has changed the record store, which this one can use but not copy:"
+                          " update Lookhaven on this host");
+    }
 }
 
 void LiftTimeLimit(Connection& connection, soci::session& sql) {
@@ -206,6 +216,7 @@ void CheckpointWal(Store& store) {
 std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
     const std::vector<std::string> tables = CopiedTables(sessions);
     return source.connection().ReadAtOneMoment([&](soci::session& from) {
+        RequireKnown(from);
         LiftTimeLimit(source.connection(), from);
         return target.connection().Write([&](soci::session& to) {
             LiftTimeLimit(target.connection(), to);

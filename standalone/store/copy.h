@@ -20,7 +20,8 @@ void RequireUnused(Store& store);
 void RequireTablesOnly(const std::string& url);
 
 // What one moment of the source holds, its counters and settings included, while others go on changing it. The target
-// was just set up: throws as RequireUnused, since its records would be lost. Returns the number of rows. Leases of
+// was just set up: throws as RequireUnused, since its records would be lost; SchemaError for a source that a newer
+// program has added to. Returns the number of rows. Leases of
 // recorders and of cameras are not copied, nor are failed log-ins.
 std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions);
 

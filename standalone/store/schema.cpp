@@ -264,6 +264,11 @@ constexpr const char* kMountPathsOnPostgresql[] = {
     "alter table mounts drop constraint mounts_path_key",
 };
 
+// For hosts that share the store; content is base64.
+constexpr const char* kEmapPictures[] = {
+    ("create table emap_pictures (name text not null primary key, content text not null, touched_s bigint not null)"),
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -283,6 +288,7 @@ constexpr Migration kMigrations[] = {
     {"the words in texts of marks", {}, kMarkWordsOnSqlite, kMarkWordsOnPostgresql},
     {"what accounts prefer", kPreferences},
     {"hosts that share the store", kHosts, kMountPathsOnSqlite, kMountPathsOnPostgresql},
+    {.purpose = "pictures of e-maps that hosts share", .statements = kEmapPictures, .is_addition = true},
 };
 
 }  // namespace

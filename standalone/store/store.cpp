@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/store.h"
 
+#include <charconv>
 #include <chrono>
 #include <filesystem>
 #include <string_view>
@@ -33,6 +34,27 @@ int ReadVersion(Connection& connection) {
                : 0;
 }
 
+// The schema of the oldest programs that can use this program's store.
+int OldestCompatible() {
+    int version = 0;
+    int compatible = 0;
+    for (const Migration& migration : Migrations()) {
+        compatible = migration.is_addition ? compatible : version + 1;
+        ++version;
+    }
+    return compatible;
+}
+
+// Whether the newer program that has brought the store to its schema has left it to this one, too.
+bool IsCompatible(Connection& connection) {
+    const std::string oldest =
+        connection.FetchOne<std::string>("select value from settings where name = 'schema_compatible'").value_or("");
+    int version = 0;
+    const char* const end = oldest.data() + oldest.size();
+    const auto [rest, error] = std::from_chars(oldest.data(), end, version);
+    return error == std::errc() && rest == end && version > 0 && version <= Store::SchemaVersion();
+}
+
 [[noreturn]] void ThrowNewer(int version) {
     throw SchemaError("the record store has schema " + std::to_string(version) + ", newer than this program's " +
                       std::to_string(Store::SchemaVersion()) + ": update Lookhaven on this host");
@@ -47,7 +69,7 @@ int ReadVersionOfReady(Connection& connection) try {
 
 void CheckVersion(Connection& connection) {
     const int version = ReadVersionOfReady(connection);
-    if (version > Store::SchemaVersion()) {
+    if (version > Store::SchemaVersion() && !IsCompatible(connection)) {
         ThrowNewer(version);
     }
     if (version == 0) {
@@ -153,6 +175,10 @@ int TakeSteps(const Connection& connection, soci::session& sql, int version) {
     }
     const int reached = version + steps;
     Execute(sql, "update schema_version set version = :version", reached);
+    Execute(sql,
+            "insert into settings (name, value) values ('schema_compatible', :oldest)"
+            " on conflict (name) do update set value = excluded.value",
+            std::to_string(OldestCompatible()));
     return steps;
 }
 
@@ -187,7 +213,8 @@ bool Store::IsSqlite() const {
 }
 
 bool Store::IsUpToDate() try {
-    return ReadVersionOfReady(*connection_) == SchemaVersion();
+    CheckVersion(*connection_);
+    return true;
 } catch (const std::exception&) {
     return false;
 }
@@ -203,10 +230,10 @@ int Store::Migrate(const std::string& url) {
         }
         LockSchema(connection, sql);
         const int version = ReadVersion(connection);
-        if (version > SchemaVersion()) {
+        if (version > SchemaVersion() && !IsCompatible(connection)) {
             ThrowNewer(version);
         }
-        const int steps = version == SchemaVersion() ? 0 : TakeSteps(connection, sql, version);
+        const int steps = version >= SchemaVersion() ? 0 : TakeSteps(connection, sql, version);
         SetOnce(sql, "installation", RandomHex(kInstallationIdBytes));
         SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;

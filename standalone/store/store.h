@@ -70,11 +70,13 @@ class Connection;
 class Store {
   public:
     // url: "sqlite:<path>", "postgresql://…" or "postgresql:<connection options>". Throws SchemaError when the store
-    // was not set up by this version, StoreError when it cannot be opened. Creates nothing.
+    // was not set up by this version, or by a newer one that leaves it to this one as well; StoreError when it cannot
+    // be opened. Creates nothing.
     static Store Open(const std::string& url);
 
     // Brings the store to this program's schema, from nothing or from any older version, in one transaction; returns
-    // the number of steps taken, 0 when there was nothing to do. A new SQLite file is private to its owner.
+    // the number of steps taken, 0 when there was nothing to do. Throws as Open for one of a newer program. A new SQLite
+    // file is private to its owner.
     static int Migrate(const std::string& url);
 
     // Copies a SQLite store that an older program made, without its sessions, to the private file
@@ -91,7 +93,7 @@ class Store {
     // The schema version this program needs.
     static int SchemaVersion();
 
-    // Whether the store, which Open found at this program's schema, still is. False also where it cannot be read.
+    // Whether Open would take the store still. False also where it cannot be read.
     bool IsUpToDate();
 
     Store(Store&&) noexcept;

@@ -131,9 +131,7 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
 }
 
 void CliTest::UndoLastMigration() {
-    Sql({"drop table hosts", "drop table camera_leases", "delete from counters where name = 'host'",
-         "alter table cameras drop column host_id", "alter table mounts drop column host_id",
-         "update schema_version set version = version - 1"});
+    Sql({"drop table emap_pictures", "update schema_version set version = version - 1"});
 }
 
 void CliTest::SetUpDemo() {

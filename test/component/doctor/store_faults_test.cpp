@@ -30,8 +30,16 @@ TEST_F(DoctorTest, FaultsOfFolderAndStoreAreFoundAndMendedWithoutLoss) {
          Shell("cp " + database + " " + database + "-backup && printf nothing | dd conv=notrunc of=" + database +
                " 2>/dev/null"),
          "do: stop the server, replace the store", Shell("cat " + database + "-backup > " + database)},
-        {"newer store", Sql("update schema_version set version = 99"), "update Lookhaven",
-         Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))},
+        {"newer store",
+         [&] {
+             Sql("update schema_version set version = 99")();
+             Sql("update settings set value = '99' where name = 'schema_compatible'")();
+         },
+         "update Lookhaven",
+         [&] {
+             Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))();
+             Sql("update settings set value = '1' where name = 'schema_compatible'")();
+         }},
         {"older store", [&] { UndoLastMigration(); }, "do: lookhaven init"},
         {"no manager", Sql("update users set privilege = 2 where name = 'admin'"), "no account may manage"},
         {"no live source", Sql("update cameras set live_profile = 2 where id = 1"), "camera 1 has no source"},

@@ -81,7 +81,50 @@ TEST_P(PicturesTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(, PicturesTest, testing::Values(store::Engine::kSqlite), store::EngineName);
+TEST_P(PicturesTest, HostsOfOneStoreHaveEachOthersPictures) {
+    const bool is_shared = GetParam() == store::Engine::kPostgresql;
+    const test::TemporaryFolder other_folder{"lookhaven other host"};
+    Pictures other{store_, other_folder};
+    const auto can_read = [&other](const std::string& name, const std::string& bytes) {
+        try {
+            return other.Read(name) == bytes;
+        } catch (const std::system_error&) {
+            return false;
+        }
+    };
+    const std::string png = "\x89PNG\r\n\x1a\n" + std::string("\0\xff'", 3);
+    const int map = emaps_.Add({.name = "Ground floor"});
+    Put(map, png);
+    const std::string first = emaps_.Find(map)->image;
+    EXPECT_EQ(can_read(first, png), is_shared);
+    other.Withdraw(first);
+    other.Sweep();
+    EXPECT_EQ(can_read(first, png), is_shared) << "a map has it";
+
+    Force("delete from emap_pictures");  // as before the host had others
+    other.Share();
+    EXPECT_FALSE(can_read(first, png)) << "nobody gave it";
+    pictures_.Share();
+    pictures_.Share();
+    EXPECT_EQ(can_read(first, png), is_shared);
+    EXPECT_EQ(Ask("select count(*) from emap_pictures"), is_shared ? "1" : "0");
+
+    Force("update emap_pictures set touched_s = touched_s - 3600");
+    Put(map, "\xff\xd8\xff\xe0");
+    EXPECT_EQ(can_read(first, png), is_shared) << "whoever has just been told of it";
+    Force("update emap_pictures set touched_s = touched_s - 3600");
+    other.Sweep();
+    EXPECT_FALSE(can_read(first, png)) << "no map has it any more";
+    const std::string second = emaps_.Find(map)->image;
+    EXPECT_EQ(can_read(second, "\xff\xd8\xff\xe0"), is_shared);
+
+    const std::string unused = pictures_.Write(png);
+    pictures_.Withdraw(unused);
+    EXPECT_FALSE(can_read(unused, png));
+}
+
+INSTANTIATE_TEST_SUITE_P(, PicturesTest, testing::Values(store::Engine::kSqlite, store::Engine::kPostgresql),
+                         store::EngineName);
 
 }  // namespace
 }  // namespace lookhaven::emap

@@ -4,6 +4,7 @@
 #include "standalone/store/copy.h"
 
 #include "standalone/store/connection.h"
+#include "standalone/store/emap_pictures.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/events.h"
 #include "standalone/store/groups.h"
@@ -33,6 +34,8 @@ class CopyTest : public StoreTest {
         Preferences(store_).Change(user, [](const std::string&) { return R"({"layout":"2"})"; });
         Settings(store_).Set("place", "Zürich :name $1 \\");
         Emaps(store_).Add({.name = "Ground floor"});
+        EmapPictures(store_).Put("1-a.png", kPicture, 1);
+        EmapPictures(store_).Put("1-b.png", "b", 1);
         std::vector<Event> events;
         for (int i = 0; i < kEvents; ++i) {
             events.push_back({.camera_id = 1,
@@ -57,6 +60,7 @@ class CopyTest : public StoreTest {
         }
     }
 
+    const std::string kPicture = std::string(100'000, '\xff') + std::string("\0'", 2);
     static constexpr int kEvents = 1'100;  // more than one fetch of a cursor
 };
 
@@ -74,6 +78,8 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Preferences(copy).Find(1), R"({"layout":"2"})");
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kExport), ElementsAre(2));
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kPlayback), testing::IsEmpty());
+        EXPECT_EQ(EmapPictures(copy).Find("1-a.png"), kPicture);
+        EXPECT_EQ(EmapPictures(copy).Find("1-b.png"), "b");
         EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));
         EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));

@@ -7,6 +7,7 @@
 
 #include <sys/stat.h>
 
+#include "standalone/store/copy.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/recording_plans.h"
@@ -46,9 +47,48 @@ TEST_P(EmptyStore, OfAnotherVersionIsRefusedWithTheWayOut) {
     Force("update schema_version set version = 0");
     EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("run lookhaven init")));
     Force("update schema_version set version = 99");
+    Force("update settings set value = '99' where name = 'schema_compatible'");
     EXPECT_THAT([&] { Store::Open(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
     EXPECT_THAT([&] { Store::Migrate(url_); }, ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
     EXPECT_EQ(Ask("select version from schema_version"), "99");
+}
+
+TEST_P(EmptyStore, ThatANewerProgramHasOnlyAddedToIsUsedButNotCopied) {
+    const int own = Store::SchemaVersion();
+    Store::Migrate(url_);
+    Store before = Store::Open(url_);
+    Force("create table additions (id integer not null primary key)");
+    Force("alter table cameras add column addition integer not null default 7");
+    Force("update schema_version set version = " + std::to_string(own + 1));
+    const struct {
+        std::string oldest;
+        bool is_taken;
+    } rows[] = {{std::to_string(own), true},
+                {std::to_string(own - 1), true},
+                {std::to_string(own + 1), false},
+                {"", false},
+                {"-1", false},
+                {std::to_string(own) + "x", false},
+                {"99999999999", false}};
+    for (const auto& row : rows) {
+        Force("update settings set value = '" + row.oldest + "' where name = 'schema_compatible'");
+        EXPECT_EQ(before.IsUpToDate(), row.is_taken) << row.oldest;
+        if (!row.is_taken) {
+            EXPECT_THROW(Store::Open(url_), SchemaError) << row.oldest;
+            EXPECT_THROW(Store::Migrate(url_), SchemaError) << row.oldest;
+            continue;
+        }
+        EXPECT_EQ(Store::Migrate(url_), 0) << "an older program is started again";
+        Store store = Store::Open(url_);
+        Cameras(store).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+        const std::string copied = NewUrl(Engine::kSqlite, "copy" + row.oldest + ".db");
+        Store::Migrate(copied);
+        Store copy = Store::Open(copied);
+        EXPECT_THAT([&] { CopyRecords(store, copy, CopySessions::kNo); },
+                    ThrowsMessage<SchemaError>(HasSubstr("update Lookhaven")));
+    }
+    EXPECT_EQ(Ask("select version from schema_version"), std::to_string(own + 1)) << "nobody takes it back";
+    EXPECT_EQ(Ask("select count(*) from cameras where addition = 7"), "2");
 }
 
 TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
