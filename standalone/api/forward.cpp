@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
+#include <thread>
 
 #include <poll.h>
 #include <unistd.h>
@@ -12,6 +13,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/compact_json.h"
+#include "standalone/binding/send_queue.h"
 #include "standalone/remote/forward.h"
 #include "standalone/remote/forward_token.h"
 #include "standalone/store/sessions.h"
@@ -29,6 +31,9 @@ constexpr std::size_t kMaxTagBytes = 100;
 constexpr int kBadGateway = 502;
 // A player answers within a second, and each host is asked.
 constexpr std::chrono::seconds kMaxSearch{3};
+constexpr std::chrono::milliseconds kDrainPoll{3};
+// A picture comes in pieces, which belong together.
+constexpr std::chrono::milliseconds kPictureTime{20};
 
 bool IsPrintable(std::string_view text) {
     return std::ranges::all_of(text, [](char character) { return character >= ' ' && character <= '~'; });
@@ -104,7 +109,12 @@ class AnswerForwarder : public remote::AnswerSink {
         return Send(lines.append("\r\n"));
     }
 
-    bool Write(std::span<const char> bytes) override { return Send(bytes); }
+    bool Write(std::span<const char> bytes) override {
+        if (kind_ == Forwarded::kLive) {
+            AwaitDrained();
+        }
+        return Send(bytes);
+    }
 
     // Looks at the connection, since a viewer who has gone is otherwise noticed only when something is sent.
     bool WantsMore() override {
@@ -121,6 +131,19 @@ class AnswerForwarder : public remote::AnswerSink {
     }
 
   private:
+    // As a stream of this host's own: what waits for a viewer who cannot keep up waits at the other host, which leaves
+    // pictures out, and not here, where it gets old.
+    void AwaitDrained() {
+        binding::SendQueue* const queue = call_.context.Queue();
+        if (queue == nullptr || std::chrono::steady_clock::now() < next_look_) {
+            return;
+        }
+        while (!queue->IsDrained() && !queue->TakeOverduePicture() && GoesOn()) {
+            std::this_thread::sleep_for(kDrainPoll);
+        }
+        next_look_ = std::chrono::steady_clock::now() + kPictureTime;
+    }
+
     bool Send(std::span<const char> bytes) {
         iovec piece{const_cast<char*>(bytes.data()), bytes.size()};
         return output_.Send({&piece, 1});
@@ -129,6 +152,7 @@ class AnswerForwarder : public remote::AnswerSink {
     const Call& call_;
     binding::Output& output_;
     const Forwarded kind_;
+    std::chrono::steady_clock::time_point next_look_;
     int status_ = 0;
 };
 

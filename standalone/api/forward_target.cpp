@@ -2,6 +2,7 @@
 #include "standalone/api/forward_target.h"
 
 #include <algorithm>
+#include <chrono>
 #include <optional>
 #include <set>
 #include <string>
@@ -21,6 +22,8 @@ namespace lookhaven::api {
 
 namespace {
 
+// Of all hosts that are asked for a player; the last may take three seconds more.
+constexpr std::chrono::seconds kMaxSearch{9};
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
 // What a call needs that only one host has.
@@ -157,7 +160,11 @@ bool ForwardControl(const Call& call, int own_host) {
     }
     const int known = call.slots.FindForwardedPlayer(call.context.Session(), key.asInt64());
     const Forwarded kind = known != 0 ? Forwarded::kControl : Forwarded::kSearch;
+    const auto until = std::chrono::steady_clock::now() + kMaxSearch;
     for (const store::Host& host : HostsToAsk(call, own_host, known)) {
+        if (std::chrono::steady_clock::now() > until) {
+            break;  // machines that are off, each of which takes seconds to ask
+        }
         try {
             if (Forward(call, host, kind, "the player")) {
                 return true;
