@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/metrics.h"
 
+#include <algorithm>
 #include <chrono>
 #include <fstream>
 #include <map>
@@ -11,6 +12,7 @@
 
 #include "standalone/api/health.h"
 #include "standalone/api/metrics_text.h"
+#include "standalone/api/store_metrics.h"
 #include "standalone/base/clock.h"
 #include "standalone/control/common_config.h"
 #include "standalone/control/stream_counters.h"
@@ -18,7 +20,6 @@
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
-#include "standalone/store/settings.h"
 
 namespace lookhaven::api {
 
@@ -65,6 +66,11 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
     AddStreams(text, streams, "lookhaven_recording_lag_seconds", "gauge",
                "How old the newest picture is that the disk has, but for half a second.", true,
                [&](const Counters& each) { return (now_us - static_cast<double>(each.written_us)) / 1e6; });
+    text.Family("lookhaven_recording_store_lag_seconds", "gauge",
+                "How long ago the record store had the rows of all that was recorded.");
+    if (const auto each = std::ranges::find(streams, true, &Counters::is_recorded); each != streams.end()) {
+        text.Sample((now_us - static_cast<double>(each->stored_us)) / 1e6);
+    }
 }
 
 struct MountFigures {
@@ -129,24 +135,6 @@ void AddMounts(MetricsText& text, const base::Installation& installation, store:
         [](const MountFigures& each) {
             return each.oldest_s ? std::optional(static_cast<double>(*each.oldest_s)) : std::nullopt;
         });
-}
-
-void AddStore(MetricsText& text, store::Store* records) {
-    const std::int64_t begin_us = base::MonotonicMicros();
-    bool is_up = records != nullptr;
-    try {
-        if (is_up) {
-            store::Settings(*records).Revision();
-        }
-    } catch (const store::StoreError&) {
-        is_up = false;
-    }
-    text.Family("lookhaven_store_up", "gauge", "Whether the record store answers.");
-    text.Sample(is_up ? 1 : 0);
-    if (is_up) {
-        text.Family("lookhaven_store_latency_seconds", "gauge", "How long the record store took for one row.");
-        text.Sample(static_cast<double>(base::MonotonicMicros() - begin_us) / 1e6);
-    }
 }
 
 // "VEXO.Event/List": the API's name, and the method's where it is known.
@@ -240,6 +228,7 @@ std::string MetricsOf(const Call& call, store::Store* records) {
     try {
         if (records != nullptr) {
             AddMounts(text, installation, *records);
+            AddHosts(text, installation, *records);
         }
     } catch (const store::StoreError&) {
         // lookhaven_store_up tells it

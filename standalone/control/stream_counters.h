@@ -33,6 +33,7 @@ struct StreamCounters {
     std::uint64_t dropped_pictures = 0;  // because the disk was too slow
     std::uint64_t queued_bytes = 0;      // waiting for the disk
     std::int64_t written_us = 0;         // up to when what had come is on the disk
+    std::int64_t stored_us = 0;          // when the store had the rows of all recordings
 
     bool operator==(const StreamCounters&) const = default;
 };

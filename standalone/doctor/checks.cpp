@@ -21,6 +21,7 @@ std::span<const Check> Checks() {
                                         {"recordings", CheckRecordings},
                                         {"maintenance", CheckMaintenance},
                                         {"shared memory", CheckSegments},
+                                        {"hosts", CheckHosts},
                                         {"paired hosts", CheckPairedHosts}};
     return kChecks;
 }

@@ -76,6 +76,9 @@ Findings CheckWebServer(const base::Installation& installation);
 Findings CheckCertificate(const base::Installation& installation);
 Findings CheckPairedHosts(const base::Installation& installation);
 
+// host_checks.cpp
+Findings CheckHosts(const base::Installation& installation);
+
 // What starts the server again, as a remedy; log: where to look where that does not help.
 std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log);
 

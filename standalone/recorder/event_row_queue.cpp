@@ -21,7 +21,8 @@ constexpr std::int64_t kMaxDelayS = 3;
 }  // namespace
 
 EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder, int host, LeaseTimes times)
-    : lease_(recorder, base::MonotonicMicros, host, times),
+    : stored_us_(base::MonotonicMicros()),
+      lease_(recorder, base::MonotonicMicros, host, times),
       thread_(store_url, "store the events, recording goes on",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -107,6 +108,7 @@ void EventRowQueue::Work(store::Store& store) {
     std::vector<int> dirty;
     std::map<int, std::int64_t> written_until_s;
     const std::int64_t now_s = base::WallSeconds();
+    const std::int64_t now_us = base::MonotonicMicros();
     {
         const std::lock_guard lock(mutex_);
         written_until_s = written_until_s_;
@@ -133,6 +135,7 @@ void EventRowQueue::Work(store::Store& store) {
     if (is_all_stored) {
         stored_until_s_ = std::move(written_until_s);
         stored_s_ = now_s - kMaxDelayS;
+        stored_us_ = now_us;
     }
 }
 

@@ -51,6 +51,8 @@ class EventRowQueue {
     bool HasUnstored(int camera) const;
     // Whether all such rows are in the store; also for a camera that is not recorded.
     bool HasStored(int camera, std::int64_t until_s) const;
+    // When all rows that had been Put were in the store, in monotonic microseconds; at first when this queue began.
+    std::int64_t StoredUs() const { return stored_us_; }
 
     // The marks whose footage is still to come, as of the last refresh.
     std::vector<store::Mark> PendingMarks() const;
@@ -84,6 +86,7 @@ class EventRowQueue {
     std::map<int, std::int64_t> written_until_s_;  // of the cameras that are recorded
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;
+    std::atomic<std::int64_t> stored_us_;
     LeaseKeeper lease_;  // only the thread uses it
     std::atomic<bool> is_refused_ = false;
     std::atomic<bool> is_stopping_ = false;

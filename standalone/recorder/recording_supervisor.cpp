@@ -193,6 +193,7 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
     counters.dropped_pictures = queue->Dropped().frames;
     counters.queued_bytes = queue->QueuedBytes();
     counters.written_us = entries_.at(counters.stream.camera).worker->WrittenUs();
+    counters.stored_us = rows_.StoredUs();
 }
 
 void RecordingSupervisor::RequestStop() {

@@ -105,6 +105,7 @@ class MonitoringTest(unittest.TestCase):
         for name in ("recorder", "store"):
             self.assertEqual(now[f"lookhaven_{name}_up", ""], 1)
         self.assertLess(now["lookhaven_recording_lag_seconds", stream_1], 5)
+        self.assertLess(now["lookhaven_recording_store_lag_seconds", ""], 10)
 
     def test_is_well_formed_for_prometheus(self):
         if not shutil.which("promtool"):

@@ -11,6 +11,7 @@
 #include "standalone/base/file.h"
 #include "standalone/base/installation.h"
 #include "standalone/control/common_config.h"
+#include "standalone/maintenance/host_status.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/ring/writer.h"
 #include "standalone/store/servers.h"
@@ -127,6 +128,38 @@ TEST_F(DoctorTest, Ipv6IsNotedWhereTheMachineHasItAndTheWebServerDoesNot) {
     const cli::Outcome with = Examine();
     EXPECT_EQ(with.code, 0) << with.text;
     EXPECT_THAT(with.text, testing::Not(HasSubstr("IPv6")));
+}
+
+TEST_F(DoctorTest, AHostThatIsAwayIsNamedAndAMachineThatIsNoneIsTold) {
+    const auto add_host = [this](int id) {
+        return Sql("insert into hosts (id, name, address, port, certificate, version, draining, has_room, heartbeat,"
+                   " holder, first_reserved_id) values (" +
+                   std::to_string(id) + ", 'nvr" + std::to_string(id) +
+                   "', '192.0.2.7', 8443, '', '', 0, 1, 0, '', 1)");
+    };
+    const auto report = [this](maintenance::HostState of_other) {
+        return [this, of_other] {
+            maintenance::WriteHostStatus(base::Installation(home_),
+                                         {{1, maintenance::HostState::kLocal, 0}, {2, of_other, 4}});
+        };
+    };
+    const std::string host_file = home_.string() + "/host";
+    const Fault faults[] = {
+        {"none of the hosts", add_host(1), "this machine is none of the hosts", Sql("delete from hosts")},
+        {"host that is away",
+         [&] {
+             add_host(1)();
+             add_host(2)();
+             Shell("echo 1 > " + host_file + " && chown --reference=" + home_.string() + " " + host_file)();
+             report(maintenance::HostState::kOffline)();
+         },
+         "host nvr2 is away", report(maintenance::HostState::kOnline)},
+    };
+    ExpectFoundAndMended(faults);
+    Sql("update hosts set version = 'v' || id")();
+    const cli::Outcome noted = Examine();
+    EXPECT_EQ(noted.code, 0) << noted.text;
+    EXPECT_THAT(noted.text, HasSubstr("host nvr2 runs version v2, this one v1"));
 }
 
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {

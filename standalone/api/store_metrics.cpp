@@ -1,0 +1,88 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/store_metrics.h"
+
+#include <algorithm>
+#include <vector>
+
+#include "standalone/base/clock.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/host_status.h"
+#include "standalone/store/camera_leases.h"
+#include "standalone/store/hosts.h"
+#include "standalone/store/replication.h"
+#include "standalone/store/settings.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+void AddStates(MetricsText& text, const base::Installation& installation, store::Store& records) {
+    const std::vector<store::Host> hosts = store::Hosts(records).All();
+    const bool is_watching = control::FindRecorder(installation) == control::RecorderState::kAlive;
+    const auto states =
+        is_watching ? maintenance::ReadHostStatus(installation) : std::vector<maintenance::HostStatus>();
+    text.Family("lookhaven_host_up", "gauge",
+                "Whether the host's recorder runs and reaches the store, as this host's recorder sees it.");
+    for (const store::Host& host : hosts) {
+        if (const auto state = std::ranges::find(states, host.id, &maintenance::HostStatus::host);
+            state != states.end()) {
+            text.Sample(state->state == maintenance::HostState::kOffline ? 0 : 1, {{"host", host.name}});
+        }
+    }
+    const std::vector<store::CameraLease> leases = store::CameraLeases(records).List();
+    text.Family("lookhaven_host_cameras", "gauge", "Cameras whose lease the host has.");
+    for (const store::Host& host : hosts) {
+        text.Sample(static_cast<double>(std::ranges::count(leases, host.id, &store::CameraLease::host_id)),
+                    {{"host", host.name}});
+    }
+    text.Family("lookhaven_cameras_without_host", "gauge", "Enabled cameras whose lease no host has.");
+    text.Sample(static_cast<double>(
+        std::ranges::count_if(leases, [](const auto& lease) { return lease.enabled && lease.host_id == 0; })));
+}
+
+// As PostgreSQL tells it.
+void AddReplication(MetricsText& text, store::Store& records) {
+    const auto replication = store::ReadReplication(records);
+    if (!replication) {
+        return;
+    }
+    text.Family("lookhaven_store_standby", "gauge", "Whether the database server that answers is a standby.");
+    text.Sample(replication->is_standby ? 1 : 0);
+    text.Family("lookhaven_store_standbys", "gauge", "Standbys that are connected to the database server.");
+    text.Sample(replication->standbys);
+    if (replication->told > 0) {  // which takes a right of its own
+        text.Family("lookhaven_store_standbys_streaming", "gauge", "Of these, those that follow it.");
+        text.Sample(replication->streaming);
+        text.Family("lookhaven_store_standby_lag_bytes", "gauge", "By how much the last of them is behind.");
+        text.Sample(static_cast<double>(replication->lag_bytes));
+    }
+}
+
+}  // namespace
+
+void AddStore(MetricsText& text, store::Store* records) {
+    const std::int64_t begin_us = base::MonotonicMicros();
+    bool is_up = records != nullptr;
+    try {
+        if (is_up) {
+            store::Settings(*records).Revision();
+        }
+    } catch (const store::StoreError&) {
+        is_up = false;
+    }
+    text.Family("lookhaven_store_up", "gauge", "Whether the record store answers.");
+    text.Sample(is_up ? 1 : 0);
+    if (is_up) {
+        text.Family("lookhaven_store_latency_seconds", "gauge", "How long the record store took for one row.");
+        text.Sample(static_cast<double>(base::MonotonicMicros() - begin_us) / 1e6);
+    }
+}
+
+void AddHosts(MetricsText& text, const base::Installation& installation, store::Store& records) {
+    if (installation.HostId() != 0) {
+        AddStates(text, installation, records);
+    }
+    AddReplication(text, records);
+}
+
+}  // namespace lookhaven::api

@@ -1,0 +1,73 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The hosts that share this one's store, as its recorder sees them, and the standbys of that store.
+#include <algorithm>
+
+#include "standalone/base/concat.h"
+#include "standalone/control/common_config.h"
+#include "standalone/doctor/checks.h"
+#include "standalone/maintenance/host_status.h"
+#include "standalone/store/hosts.h"
+#include "standalone/store/replication.h"
+
+namespace lookhaven::doctor {
+
+namespace {
+
+void AddAway(const base::Installation& installation, const std::vector<store::Host>& hosts, Findings& findings) {
+    if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
+        return;  // whose report is old; CheckRecorder tells it
+    }
+    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(installation)) {
+        const auto host = std::ranges::find(hosts, status.host, &store::Host::id);
+        if (host != hosts.end() && status.state == maintenance::HostState::kOffline) {
+            findings.push_back({base::Concat("host ", host->name,
+                                             " is away: ", "its recorder does not run, or does not reach the store"),
+                                "start Lookhaven there; where it is gone for good, remove the host"});
+        }
+    }
+}
+
+void AddVersions(const std::vector<store::Host>& hosts, const store::Host& own, Findings& findings) {
+    for (const store::Host& host : hosts) {
+        if (!host.version.empty() && !own.version.empty() && host.version != own.version) {
+            findings.push_back(
+                {base::Concat("host ", host.name, " runs version ", host.version, ", this one ", own.version),
+                 "upgrade all hosts to the same version", Severity::kNote});
+        }
+    }
+}
+
+void AddStandbys(const store::Replication& replication, Findings& findings) {
+    if (const int lost = replication.told - replication.streaming; lost > 0) {
+        findings.push_back(
+            {base::Concat(lost, " of ", replication.standbys, " standbys of the database server do not follow it yet"),
+             "look at pg_stat_replication, and at the log of the standby", Severity::kNote});
+    }
+}
+
+}  // namespace
+
+Findings CheckHosts(const base::Installation& installation) {
+    Findings findings;
+    try {
+        store::Store store = store::Store::Open(installation.StoreUrl());
+        const std::vector<store::Host> hosts = store::Hosts(store).All();
+        const auto own = std::ranges::find(hosts, installation.HostId(), &store::Host::id);
+        if (own != hosts.end()) {
+            AddAway(installation, hosts, findings);
+            AddVersions(hosts, *own, findings);
+        } else if (!hosts.empty()) {
+            findings.push_back({"this machine is none of the hosts that share its store, so it records nothing",
+                                "stop the server, run lookhaven host add, and start the server"});
+        }
+        if (const auto replication = store::ReadReplication(store)) {
+            AddStandbys(*replication, findings);
+        }
+    } catch (const store::StoreError&) {
+        return {};  // CheckStore reports it
+    }
+    return findings;
+}
+
+}  // namespace lookhaven::doctor
