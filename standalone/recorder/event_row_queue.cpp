@@ -12,7 +12,8 @@ namespace lookhaven::recorder {
 
 namespace {
 
-// With segments of five minutes, recording continues for twenty minutes without the store.
+// At least half of them are there. With segments of five minutes, recording continues for two hours and ten to twenty
+// minutes without the store, since the last event may last two hours.
 constexpr std::size_t kIdsPerCamera = 4;
 // From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
 // second.
@@ -105,19 +106,24 @@ void EventRowQueue::RequestStop() {
 
 void EventRowQueue::Work(store::Store& store) {
     store::Events events(store);
-    std::vector<int> dirty;
+    std::vector<store::Event> grown;
+    std::vector<int> dirty;  // the others
     std::map<int, std::int64_t> written_until_s;
     const std::int64_t now_s = base::WallSeconds();
     const std::int64_t now_us = base::MonotonicMicros();
     {
         const std::lock_guard lock(mutex_);
         written_until_s = written_until_s_;
-        for (const auto& [id, entry] : entries_) {
-            if (entry.is_dirty) {
+        for (auto& [id, entry] : entries_) {
+            if (entry.is_dirty && entry.is_stored && entry.row.recording) {
+                entry.is_dirty = false;
+                grown.push_back(entry.row);
+            } else if (entry.is_dirty) {
                 dirty.push_back(id);
             }
         }
     }
+    StoreGrowth(events, grown);
     bool is_all_stored = true;
     for (const int id : dirty) {
         is_all_stored &= StoreRow(events, id);
@@ -185,6 +191,20 @@ void EventRowQueue::FillReserve(store::Store& store) {
     }
 }
 
+void EventRowQueue::StoreGrowth(store::Events& events, const std::vector<store::Event>& grown) {
+    try {
+        if (!grown.empty()) {
+            events.Grow(grown);
+        }
+    } catch (...) {
+        const std::lock_guard lock(mutex_);
+        for (const store::Event& row : grown) {
+            entries_.at(row.id).is_dirty = true;
+        }
+        throw;
+    }
+}
+
 // False when the row must be stored once more.
 bool EventRowQueue::StoreRow(store::Events& events, int id) {
     Entry entry;
@@ -197,8 +217,6 @@ bool EventRowQueue::StoreRow(store::Events& events, int id) {
     try {
         if (!entry.is_stored) {
             events.Begin(row);
-        } else if (row.recording) {
-            events.Grow(id, row.end_s, row.frame_count, row.size_bytes);
         } else {
             events.Finish(id, row.end_s, row.frame_count, row.size_bytes);
         }

@@ -75,6 +75,7 @@ class EventRowQueue {
     void ReleaseLease(store::Store& store);
     void ForgetReserve();
     void FillReserve(store::Store& store);
+    void StoreGrowth(store::Events& events, const std::vector<store::Event>& grown);
     bool StoreRow(store::Events& events, int id);
 
     mutable std::mutex mutex_;

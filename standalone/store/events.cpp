@@ -35,24 +35,6 @@ void RequireEvent(const Event& event) {
     }
 }
 
-bool SetProgress(Connection& connection, int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes,
-                 bool recording) {
-    const Durability durability = recording ? Durability::kLazy : Durability::kSafe;
-    return connection.Write(
-        [&](soci::session& sql) {
-            const auto start_s = FetchOne<std::int64_t>(sql, "select start_s from events where id = :id", id);
-            if (!start_s) {
-                return false;
-            }
-            RequireSpan(*start_s, end_s);
-            return Execute(sql,
-                           "update events set end_s = :end, frame_count = :frames, size_bytes = :size,"
-                           " recording = :recording where id = :id",
-                           end_s, frame_count, size_bytes, recording, id) > 0;
-        },
-        durability);
-}
-
 Event WithOrder(Event event) {
     event.order = event.order == kOrderOfId ? event.id : event.order;
     return event;
@@ -117,12 +99,39 @@ void Events::AddAll(std::span<const Event> events) {
     });
 }
 
-bool Events::Grow(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes) {
-    return SetProgress(connection_, id, end_s, frame_count, size_bytes, true);
+bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes) {
+    return connection_.Write([&](soci::session& sql) {
+        const auto start_s = FetchOne<std::int64_t>(sql, "select start_s from events where id = :id", id);
+        if (!start_s) {
+            return false;
+        }
+        RequireSpan(*start_s, end_s);
+        return Execute(sql,
+                       "update events set end_s = :end, frame_count = :frames, size_bytes = :size, recording = 0"
+                       " where id = :id",
+                       end_s, frame_count, size_bytes, id) > 0;
+    });
 }
 
-bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes) {
-    return SetProgress(connection_, id, end_s, frame_count, size_bytes, false);
+int Events::Grow(std::span<const Event> events) {
+    return connection_.Write(
+        [&](soci::session& sql) {
+            Event row;
+            std::int64_t first_start_s = 0;
+            soci::statement update =
+                Prepare(sql, kRepeatedly,
+                        "update events set end_s = :end, frame_count = :frames, size_bytes = :size, recording = 1"
+                        " where id = :id and start_s between :first and :last",
+                        row.end_s, row.frame_count, row.size_bytes, row.id, first_start_s, row.end_s);
+            int changed = 0;
+            for (const Event& event : events) {
+                row = event;
+                first_start_s = row.end_s - base::kMaxRecordingSeconds;
+                changed += Run(update);
+            }
+            return changed;
+        },
+        Durability::kLazy);
 }
 
 int Events::Remove(std::span<const int> ids) {

@@ -124,11 +124,13 @@ class Events {
     void Begin(const Event& event);
     // Stores finished rows under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(std::span<const Event> events);
-    // end_s: the event's last second on the mount. Both are false when there is no such row, and throw
-    // InvalidRecord where the event would end before it starts or become too long. A power cut may lose a Grow that has
-    // returned, never a Finish.
-    bool Grow(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
+    // end_s: the event's last second on the mount. False when there is no such row; throws InvalidRecord where the
+    // event would end before it starts or become too long.
     bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
+    // What has grown, by id, with end_s, frame_count and size_bytes; in one transaction, since a host has one for each of
+    // its cameras each second. Returns how many it has changed: an unknown one is left out, and so is one that Finish
+    // would refuse. A power cut may lose a Grow that has returned, never a Finish.
+    int Grow(std::span<const Event> events);
 
     // In one transaction; returns the number of rows removed. For rows without a file.
     int Remove(std::span<const int> ids);

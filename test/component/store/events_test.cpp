@@ -119,7 +119,13 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty()) << "retention leaves an open one alone";
     events_.BeginDeletion(std::array{event.id});
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), IsEmpty());
-    EXPECT_TRUE(events_.Grow(event.id, event.start_s + 1, 25, 5'000'000'000));
+    const auto grown = [&event](int id, std::int64_t length_s) {
+        return Event{.id = id, .end_s = event.start_s + length_s, .frame_count = 25, .size_bytes = 5'000'000'000};
+    };
+    const int unknown = events_.NextId();
+    EXPECT_EQ(events_.Grow(std::array{grown(unknown, 1), grown(event.id, 1), grown(event.id, -1),
+                                      grown(event.id, base::kMaxRecordingSeconds + 1)}),
+              1);
     store_.connection().Read([&](soci::session& sql) {
         const bool sqlite = GetParam() == Engine::kSqlite;
         std::string setting;
@@ -128,7 +134,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     });
     EXPECT_EQ(events_.Find(event.id)->end_s, event.start_s + 1);
     EXPECT_EQ(events_.Find(event.id)->size_bytes, 5'000'000'000);
-    EXPECT_THROW(events_.Grow(event.id, event.start_s - 1, 25, 1), InvalidRecord);
+    EXPECT_THROW(events_.Finish(event.id, event.start_s - 1, 25, 1), InvalidRecord);
     EXPECT_THROW(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds + 1, 25, 1), InvalidRecord);
     EXPECT_TRUE(events_.Finish(event.id, event.start_s + base::kMaxRecordingSeconds, 50, 6));
     EXPECT_THAT(events_.Open(), IsEmpty());
@@ -140,7 +146,6 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), ElementsAre(finished));
     events_.CancelDeletion(std::array{event.id});
     EXPECT_EQ(events_.Find(event.id), finished);
-    const int unknown = events_.NextId();
     KeptEvents kept(store_);
     EXPECT_EQ(kept.Keep(std::array{event.id, unknown}, {"first", "guest", 4}), 1);
     EXPECT_EQ(kept.Keep(std::array{event.id}, {"it's theirs", "admin", 5}), 1);
@@ -156,7 +161,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_FALSE(kept.Find(event.id));
     EXPECT_EQ(kept.Keep(std::array{event.id}, {}), 1);
     EXPECT_GT(unknown, event.id);
-    EXPECT_FALSE(events_.Grow(unknown, event.start_s, 1, 1) || events_.Finish(unknown, event.start_s, 1, 1));
+    EXPECT_FALSE(events_.Finish(unknown, event.start_s, 1, 1));
     EXPECT_EQ(events_.Remove(std::vector{event.id, unknown, event.id}), 1);
     EXPECT_FALSE(events_.Find(event.id) || kept.Find(event.id));
     for (const auto& spoil : std::initializer_list<void (*)(Event&)>{
