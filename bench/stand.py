@@ -11,7 +11,8 @@ import subprocess
 import sys
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "test/system"))
-from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, process_name, recorded_events, wait_until
+from installation import PASSWORDS, ROOT, Installation, call, descendants, free_port, make_certificate, process_name
+from installation import recorded_events, wait_until
 
 
 def cpu_nanos(pids):
