@@ -6,11 +6,14 @@
 #include <filesystem>
 #include <system_error>
 
+#include "standalone/admin/hosts.h"
 #include "standalone/admin/mount_claim.h"
+#include "standalone/admin/mounts.h"
 #include "standalone/base/log.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/units.h"
 #include "standalone/control/debug_log_config.h"
 #include "standalone/doctor/checks.h"
 #include "standalone/emap/pictures.h"
@@ -105,6 +108,23 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     return true;
 }
 
+// A mount that lay in the state folder moves along with it: the folder's marker says whose it is.
+void FollowStateFolder(store::Store& store, const base::Installation& installation) {
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        try {
+            const std::filesystem::path moved = installation.Home() / std::filesystem::path(mount.path).filename();
+            const maintenance::MountMarker marker = maintenance::MarkerFor(store, mount.id);
+            if (mount.IsOf(installation.HostId()) && !std::filesystem::exists(mount.path) &&
+                maintenance::MountFolder::ReadMarker(moved) == marker) {
+                const int own_host = admin::OwnHost(store, installation);
+                admin::SetMount(store, {}, mount.id, {}, {.path = moved.string(), .own_host = own_host});
+            }
+        } catch (const std::exception& error) {  // its path can still be set by hand
+            base::LogWarning(Concat("mount ", mount.id, " is not where it was: ", error.what()));
+        }
+    }
+}
+
 // Early versions marked their mounts without saying whose they are.
 void RenewMarkers(store::Store& store) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
@@ -159,9 +179,16 @@ void Init(const Console& console, const Request& request) {
     const bool mount_added = AddDefaultMount(store, installation, console);
     RenewMarkers(store);
     SharePictures(store, installation);
+    FollowStateFolder(store, installation);
     const bool admin_added = !admin.empty() && AddAdmin(store, admin);
     const std::string home = installation.Home().string();
     std::string text = "The state folder " + home + " is ready.";
+    if (mount_added) {
+        const store::Mount mount = store::Mounts(store).List().front();
+        text += "\nRecordings lie in " + mount.path + " and take up to " + FormatSize(mount.max_bytes) +
+                ", then the oldest are deleted: lookhaven mount set " + std::to_string(mount.id) +
+                " --limit changes that.";
+    }
     if (!admin.empty()) {
         text += admin_added ? "\nAdded account " + admin + "."
                             : "\nAccount " + admin + " exists already and was not changed.";

@@ -140,6 +140,15 @@ void SetPassword(const Console& console, const Request& request) {
     console.Answer(ToData(user), "Account ", user.name, " has a new password and is logged out everywhere.");
 }
 
+void SetPrivilege(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    Users users(store);
+    const User user = RequireUser(users, request.name);
+    admin::SetUser(store, {}, user.id, {}, {.privilege = request.privilege});
+    const Json::Value data = DataOf(store, user.name);
+    console.Answer(data, "Account ", user.name, " is ", PrivilegeName(data["privilege"]), " now.");
+}
+
 void Remove(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     Users users(store);
@@ -247,6 +256,8 @@ void AddUser(CLI::App& program, const Console& console) {
     add_command("add", "Adds an account; prompts for its password", Add)
         .Option("--privilege", request.privilege, "Its privilege (default: viewer)", OneOf(store::PrivilegeNames()));
     group.Add("list", "Lists the accounts", List);
+    add_command("set", "Changes an account's privilege and ends its sessions", SetPrivilege)
+        .Option("--privilege", request.privilege, "Its new privilege", OneOf(store::PrivilegeNames()), Required);
     add_command("passwd", "Changes a password and ends the account's sessions", SetPassword);
     add_command("remove", "Removes an account and ends its sessions", Remove);
     for (Command command : {add_command("deny", "Denies one thing and ends the account's sessions", Deny),

@@ -143,7 +143,8 @@ TEST_F(DemoTest, AStoreOfAnotherVersionIsLeftAsItIsByAllButInit) {
 
 TEST_F(CliTest, LogLevelsAreSetPerCategoryAndProcess) {
     const std::string self = std::to_string(::getpid());
-    Play({{"init", 0, "ready"},
+    Play({{"init", 0, "then the oldest are deleted: lookhaven mount set 1 --limit"},
+          {"init", 0, "ready", "deleted"},
           {"log show", 0, "other categories   error", "process"},
           {"log set --category liveview --category 100 debug", 0, "category 100       debug"},
           {"log show", 0, "category player    error"},
