@@ -131,14 +131,14 @@ class AnswerForwarder : public remote::AnswerSink {
     }
 
   private:
-    // As a stream of this host's own: what waits for a viewer who cannot keep up waits at the other host, which leaves
-    // pictures out, and not here, where it gets old.
+    // As a stream of this host's own: what waits for a viewer who cannot keep up waits at the other host, which drops
+    // pictures, and not here, where it gets old.
     void AwaitDrained() {
         binding::SendQueue* const queue = call_.context.Queue();
         if (queue == nullptr || std::chrono::steady_clock::now() < next_look_) {
             return;
         }
-        while (!queue->IsDrained() && !queue->TakeOverduePicture() && GoesOn()) {
+        while (!queue->IsDrained() && !queue->TakeOverduePicture() && WantsMore()) {
             std::this_thread::sleep_for(kDrainPoll);
         }
         next_look_ = std::chrono::steady_clock::now() + kPictureTime;
