@@ -62,6 +62,8 @@ class ForwardedTransfer {
         handle_.Set(CURLOPT_SOCKOPTDATA, this);
         handle_.Set(CURLOPT_WRITEFUNCTION, &ForwardedTransfer::OnBytes);
         handle_.Set(CURLOPT_WRITEDATA, this);
+        handle_.Set(CURLOPT_HEADERFUNCTION, &ForwardedTransfer::OnHeader);
+        handle_.Set(CURLOPT_HEADERDATA, this);
         handle_.Set(CURLOPT_NOPROGRESS, 0L);
         handle_.Set(CURLOPT_XFERINFOFUNCTION, &ForwardedTransfer::OnProgress);
         handle_.Set(CURLOPT_XFERINFODATA, this);
@@ -70,6 +72,9 @@ class ForwardedTransfer {
     bool Run() {
         const CURLcode result = handle_.Perform();
         if (result == CURLE_OK && !has_begun_) {
+            if (!has_whole_head_) {
+                throw NoAnswer("it broke off its answer");
+            }
             Begin();
         }
         if (!has_begun_) {
@@ -141,6 +146,13 @@ class ForwardedTransfer {
         }
     }
 
+    // A head that is cut off counts as one for libcurl.
+    static std::size_t OnHeader(char* bytes, std::size_t size, std::size_t count, void* self) {
+        const std::string_view line(bytes, size * count);
+        static_cast<ForwardedTransfer*>(self)->has_whole_head_ = line == "\r\n" || line == "\n";
+        return line.size();
+    }
+
     static int OnProgress(void* self, curl_off_t, curl_off_t, curl_off_t, curl_off_t) {
         ForwardedTransfer& transfer = *static_cast<ForwardedTransfer*>(self);
         transfer.is_late_ = !transfer.has_begun_ && Clock::now() - transfer.began_ > transfer.max_head_wait_;
@@ -162,6 +174,7 @@ class ForwardedTransfer {
     const Clock::time_point began_ = Clock::now();
     std::string problem_;
     bool is_late_ = false;
+    bool has_whole_head_ = false;
     bool has_begun_ = false;
     bool is_ended_by_sink_ = false;
     PinnedHandle handle_;

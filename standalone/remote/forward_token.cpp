@@ -41,8 +41,10 @@ std::optional<std::string> ClientInForwardToken(std::string_view token, std::str
     if (!IsTokenCode(CodeOf(key, own_host, said), token.substr(said.size()))) {
         return std::nullopt;
     }
-    // Made by the key, hence of this form.
     const std::size_t space = said.find(' ');
+    if (space == said.npos || space + 2 > said.size()) {
+        return std::nullopt;  // by a version that writes something else
+    }
     const std::string_view client = said.substr(space + 1, said.size() - space - 2);
     return IsWithinWindow(said.substr(0, space), now_s) ? std::optional(std::string(client)) : std::nullopt;
 }

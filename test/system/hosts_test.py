@@ -10,6 +10,7 @@ import unittest
 import urllib.error
 import urllib.request
 
+from docs_test import PNG
 from installation import LIVE, PLAYER, ROOT, Installation, call, recorded_events, wait_until
 from parts import Parts
 from players import BY_TIME, numbered, pictures, playing, steer
@@ -125,6 +126,33 @@ class HostsTest(unittest.TestCase):
         self.assertLessEqual(subjects, {"recorder"})
         mounts = self.other.request(call("VEXO.Mount", "List"), "admin", form={}).json["data"]["mount"]
         self.assertEqual({(each["state"], each["message"]) for each in mounts}, {("other-host", "it is of host North")})
+
+    def test_maps_are_shown_with_their_pictures_by_both_hosts(self):
+        # One that takes megabytes, which a browser cannot upload as it is.
+        large = '<svg xmlns="http://www.w3.org/2000/svg" width="9" height="9">' + " " * 8_000_000 + "</svg>"
+        self.other.cli("emap", "add", "Large", "-", text=large)
+        added = self.other.request(call("VEXO.Emap", "Add", name="Annex"), "admin", body=PNG, headers={"Content-Type": "image/png"})
+        self.assertEqual(added.status, 200, added.body)
+        maps = self.owner.request(call("VEXO.Catalog", "Emaps"), "admin").json["data"]["emap"]
+        self.assertGreaterEqual({each["name"] for each in maps}, {"Large", "Annex", "Ground floor"})
+        for each in maps:
+            for account in ("admin", "viewer"):
+                with self.subTest(each["name"], account=account):
+                    shown = [server.request(call(LIVE, "Play", camera=each["id"], itemType=1), account)
+                             for server in (self.owner, self.other)]
+                    self.assertEqual(shown[0].status, 200)
+                    self.assertTrue(shown[0].json["data"]["emap"])
+                    self.assertTrue(shown[0].body == shown[1].body, "both hosts answer the same")
+
+    def test_monitors_are_told_of_all_hosts(self):
+        for server in (self.owner, self.other):
+            with urllib.request.urlopen(f"http://127.0.0.1:{server.port}/metrics") as answer:
+                text = answer.read().decode()
+            cameras = int(self.sql("select count(*) from cameras"))
+            self.assertIn(f'lookhaven_host_cameras{{host="North"}} {cameras}\n', text)
+            self.assertIn('lookhaven_host_cameras{host="South"} 0\n', text)
+            self.assertIn("lookhaven_store_standby 0\n", text)
+            self.assertIn("lookhaven_store_standbys 0\n", text)
 
     def test_an_export_comes_through(self):
         span = {"cameralists": "1,2", "from": self.event["start"], "to": self.event["start"] + 10}
