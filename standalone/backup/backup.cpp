@@ -262,6 +262,7 @@ Summary Restore(const base::Installation& installation, int descriptor) {
     // First the pictures, which no map names yet: a map never lacks its picture.
     summary.pictures = MoveFiles(folder / kPictures, installation.Home() / kPictures);
     summary.records = CopyRecords(source, target, store::CopySessions::kNo);
+    emap::Pictures(target, installation.Home()).Share();
     const base::FileDescriptor lock = base::LockFile(installation.CertificateLockFile());
     summary.has_certificate = MoveFiles(folder / kCertificate, installation.TlsFolder()) > 0;
     MoveFiles(folder / kSigning, installation.SigningKeyFile().parent_path());

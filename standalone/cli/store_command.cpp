@@ -7,6 +7,7 @@
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
 #include "standalone/cli/running.h"
+#include "standalone/emap/pictures.h"
 #include "standalone/store/copy.h"
 #include "standalone/store/hosts.h"
 
@@ -60,6 +61,7 @@ void Move(const Console& console, const Request& request) {
     store::Store::Migrate(url);
     store::Store target = store::Store::Open(url);
     const std::int64_t records = store::CopyRecords(source, target, store::CopySessions::kYes);
+    emap::Pictures(target, installation.Home()).Share();
     installation.SetStoreUrl(url);
     console.Answer(Object("store", WithoutPassword(url), "before", before, "records", records), "Moved ", records,
                    " records to ", WithoutPassword(url), ". Those in ", before,

@@ -14,7 +14,7 @@ namespace lookhaven::doctor {
 
 namespace {
 
-void AddAway(const base::Installation& installation, const std::vector<store::Host>& hosts, Findings& findings) {
+void AddOffline(const base::Installation& installation, const std::vector<store::Host>& hosts, Findings& findings) {
     if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
         return;  // whose report is old; CheckRecorder tells it
     }
@@ -22,7 +22,7 @@ void AddAway(const base::Installation& installation, const std::vector<store::Ho
         const auto host = std::ranges::find(hosts, status.host, &store::Host::id);
         if (host != hosts.end() && status.state == maintenance::HostState::kOffline) {
             findings.push_back({base::Concat("host ", host->name,
-                                             " is away: ", "its recorder does not run, or does not reach the store"),
+                                             " is offline: ", "its recorder does not run, or does not reach the store"),
                                 "start Lookhaven there; where it is gone for good, remove the host"});
         }
     }
@@ -55,7 +55,7 @@ Findings CheckHosts(const base::Installation& installation) {
         const std::vector<store::Host> hosts = store::Hosts(store).All();
         const auto own = std::ranges::find(hosts, installation.HostId(), &store::Host::id);
         if (own != hosts.end()) {
-            AddAway(installation, hosts, findings);
+            AddOffline(installation, hosts, findings);
             AddVersions(hosts, *own, findings);
         } else if (!hosts.empty()) {
             findings.push_back({"this machine is none of the hosts that share its store, so it records nothing",

@@ -130,7 +130,7 @@ TEST_F(DoctorTest, Ipv6IsNotedWhereTheMachineHasItAndTheWebServerDoesNot) {
     EXPECT_THAT(with.text, testing::Not(HasSubstr("IPv6")));
 }
 
-TEST_F(DoctorTest, AHostThatIsAwayIsNamedAndAMachineThatIsNoneIsTold) {
+TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
     const auto add_host = [this](int id) {
         return Sql("insert into hosts (id, name, address, port, certificate, version, draining, has_room, heartbeat,"
                    " holder, first_reserved_id) values (" +
@@ -146,14 +146,14 @@ TEST_F(DoctorTest, AHostThatIsAwayIsNamedAndAMachineThatIsNoneIsTold) {
     const std::string host_file = home_.string() + "/host";
     const Fault faults[] = {
         {"none of the hosts", add_host(1), "this machine is none of the hosts", Sql("delete from hosts")},
-        {"host that is away",
+        {"host that is offline",
          [&] {
              add_host(1)();
              add_host(2)();
              Shell("echo 1 > " + host_file + " && chown --reference=" + home_.string() + " " + host_file)();
              report(maintenance::HostState::kOffline)();
          },
-         "host nvr2 is away", report(maintenance::HostState::kOnline)},
+         "host nvr2 is offline", report(maintenance::HostState::kOnline)},
     };
     ExpectFoundAndMended(faults);
     Sql("update hosts set version = 'v' || id")();
