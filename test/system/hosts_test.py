@@ -241,6 +241,8 @@ class HostsTest(unittest.TestCase):
             parts.next()
             self.owner.stop()
             wait_until(parts.ends, 10, "its streams end")
+        log = self.other.home / "log/webapi.log"
+        wait_until(lambda: f"host North broke off its answer to {LIVE}/Play" in log.read_text(), 5, "that is logged")
         for query in queries:
             began = time.monotonic()
             answer = self.other.request(query, "viewer")

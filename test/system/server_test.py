@@ -145,12 +145,15 @@ class ServerTest(unittest.TestCase):
 
     def test_https_on_every_address_and_http_on_loopback_only(self):
         with Installation() as server:
-            local = {line.split()[3] for line in said_by("ss", "-Hltn").splitlines()}
+            local = {line.split()[3]: line for line in said_by("ss", "-HltnmO").splitlines()}
             self.assertIn(f"127.0.0.1:{server.port}", local)
             self.assertNotIn(f"0.0.0.0:{server.port}", local)
             self.assertIn(f"0.0.0.0:{server.tls_port}", local)
             if pathlib.Path("/proc/net/if_inet6").read_text():
                 self.assertIn(f"[::]:{server.tls_port}", local)
+            own = [line for address, line in local.items() if int(address.rsplit(":")[-1]) in (server.port, server.tls_port)]
+            sizes = {re.search(r",tb(\d+),", line)[1] for line in own}
+            self.assertEqual(sizes, {str(2 * (192 << 10))}, "what waits in it is old pictures; the kernel doubles it")
             context = ssl.create_default_context(cafile=server.home / "tls/certificate.pem")
             context.set_alpn_protocols(["h2"])
             with socket.create_connection(("127.0.0.1", server.tls_port)) as plain:

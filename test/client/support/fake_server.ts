@@ -17,6 +17,8 @@ const kPolicy =
   "default-src 'self'; img-src 'self'; object-src 'none'; base-uri 'none'; form-action 'self'; " +
   "frame-ancestors 'none'; require-trusted-types-for 'script'";
 const kTypes: Record<string, string> = { ".html": "text/html", ".js": "text/javascript", ".css": "text/css", ".svg": "image/svg+xml" };
+/** Of the page over HTTPS. */
+const kTlsPort = "9443";
 const kFrameMs = 50;
 /** 40 ms of sound at 8 kHz, µ-law. */
 const kTone = Array.from({ length: 320 }, (_, sample) => (sample % 8 < 4 ? 0x90 : 0x10));
@@ -128,7 +130,8 @@ export class FakeServer {
     const file = join(this.#files, path);
     if (!existsSync(file)) return void answer.writeHead(404).end();
     answer.writeHead(200, { "Content-Type": kTypes[extname(path)], "Content-Security-Policy": kPolicy });
-    answer.end(readFileSync(file));
+    // As the web server does.
+    answer.end(path === "/index.html" ? readFileSync(file, "utf8").replace("8443", kTlsPort) : readFileSync(file));
   }
 
   #play(parameters: URLSearchParams, answer: ServerResponse): void {

@@ -202,10 +202,10 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     const page = await loggedIn([1, 12], 1440, 900, client.address.replace("127.0.0.1", "lan.test"));
     await allLive(page, 2);
     await open(["1/1"]);
-    expect(await page.getAttribute(".wall-advice a", "href")).toBe("https://lan.test:8443/");
+    expect(await page.getAttribute(".wall-advice a", "href")).toBe("https://lan.test:9443/");
     await page.click("[data-camera='12'] .tile-open");
     await page.locator(".large-state", { hasText: /^live, every 2 s$/ }).waitFor();
-    expect(await page.getAttribute(".large .hint a", "href")).toBe("https://lan.test:8443/#camera=12");
+    expect(await page.getAttribute(".large .hint a", "href")).toBe("https://lan.test:9443/#camera=12");
   }, 40_000);
 
   test("a session that ends leads to the login", async () => {
