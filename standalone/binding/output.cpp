@@ -14,6 +14,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/text.h"
+#include "standalone/binding/player_end.h"
 
 namespace lookhaven::binding {
 
@@ -126,6 +127,7 @@ bool Output::WaitUntilWritable(Clock::time_point progress) {
 
 void Output::Break() {
     broken_ = true;
+    LeavePlayerFile();
     std::raise(SIGTERM);
 }
 

@@ -7,10 +7,12 @@
 #include <time.h>
 
 #include "standalone/base/clock.h"
+#include "standalone/binding/player_end.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/control/progress_file.h"
 
 using lookhaven::base::MonotonicMicros;
+using lookhaven::binding::LeavePlayerFile;
 using lookhaven::binding::OrFailure;
 using lookhaven::binding::RequestContext;
 using lookhaven::control::ProgressFile;
@@ -68,7 +70,11 @@ ProgressIndicator::ProgressIndicator(long long key, bool create, bool owner) : m
 ProgressIndicator::~ProgressIndicator() = default;
 
 int ProgressIndicator::Set(int value) {
-    return m_pChannel->file && m_pChannel->file->Set(value) ? 0 : -1;
+    if (m_pChannel->file && m_pChannel->file->Set(value)) {
+        return 0;
+    }
+    LeavePlayerFile();  // the player ends at once
+    return -1;
 }
 
 int ProgressIndicator::Get() {

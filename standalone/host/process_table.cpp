@@ -42,6 +42,12 @@ bool IsPending(pid_t pid, int number) {
     return false;
 }
 
+// The session's player file names another process: a player that ends unasked would remove the file all the same.
+bool IsReplaced(pid_t pid, const control::Slot& slot) {
+    const pid_t newest = slot.player.started_us == 0 ? 0 : control::ReadPlayerFile(control::SessionOf(slot));
+    return newest > 0 && newest != pid;
+}
+
 }  // namespace
 
 void ProcessTable::Add(Child child, base::FileDescriptor connection, control::Slot& slot) {
@@ -182,6 +188,9 @@ Clock::time_point ProcessTable::SendDueSignals(Clock::time_point now) {
             continue;
         }
         if (now >= process.next_signal) {
+            if (IsReplaced(pid, *process.slot)) {
+                Signal(process.pidfd, SIGUSR1);
+            }
             Signal(process.pidfd, now - *process.ending_since >= limits_.leave ? SIGKILL : SIGTERM);
             process.next_signal = now + limits_.repeat;
         }

@@ -6,8 +6,8 @@
 //               is to end gets SIGTERM repeatedly, and SIGKILL when it does not end.
 // Invariants    (1) Signals go through a pidfd, so never to a process that took over the id.
 //               (2) Whatever ends a process, its connection is closed, its slot freed and its files swept.
-//               (3) SIGUSR1 is sent to a player only while the player file names another process of its session, which
-//                   plays.
+//               (3) SIGUSR1 is sent to a player only while the player file names another process: one of its session
+//                   that plays, unless the player is to end anyway.
 // Thread safety One thread.
 #pragma once
 

@@ -98,6 +98,7 @@ TEST_F(Playback, KeepsTheKeyOfAPlayerThatFollowsAnother) {
         Player newer = Play("PlayMjpegEvent&timestamp=7");
         older.Close();
         ASSERT_TRUE(Eventually(2s, [&] { return host_.RequestProcesses() == 1; }));
+        EXPECT_TRUE(std::filesystem::exists(PlayerFile())) << "it names the newer one, however soon the older one ends";
         EXPECT_EQ(Ask("SetRate", "timestamp=7&rate=3").status, 200);
         EXPECT_TRUE(Eventually(2s, [&] { return newer.Tell("rate") == 3; })) << round;
         older = std::move(newer);
