@@ -120,7 +120,12 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     events_.BeginDeletion(std::array{event.id});
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), IsEmpty());
     const auto grown = [&event](int id, std::int64_t length_s) {
-        return Event{.id = id, .end_s = event.start_s + length_s, .frame_count = 25, .size_bytes = 5'000'000'000};
+        Event grown_event = event;
+        grown_event.id = id;
+        grown_event.end_s = event.start_s + length_s;
+        grown_event.frame_count = 25;
+        grown_event.size_bytes = 5'000'000'000;
+        return grown_event;
     };
     const int unknown = events_.NextId();
     EXPECT_EQ(events_.Grow(std::array{grown(unknown, 1), grown(event.id, 1), grown(event.id, -1),
