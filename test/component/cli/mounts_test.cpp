@@ -19,6 +19,22 @@ using testing::ElementsAre;
 
 class MountsTest : public RecordingsTest {};
 
+TEST_F(MountsTest, AMountInAStateFolderThatMovesGoesAlong) {
+    for (const bool is_own : {true, false}) {
+        const std::filesystem::path moved = folder_ / (is_own ? "moved" : "copied");
+        std::filesystem::copy(home_, moved, std::filesystem::copy_options::recursive);
+        std::filesystem::rename(home_ / "recordings", folder_ / "away");
+        if (!is_own) {
+            std::ofstream(moved / "recordings/.lookhaven-mount") << "lookhaven mount 1 of another\n";
+        }
+        const std::string home = "--home " + moved.string() + ' ';
+        const std::string path = ((is_own ? moved : home_) / "recordings").string();
+        Play({{home + "init", 0, "ready"}, {home + "mount list --json", 0, '"' + path + '"'}});
+        std::filesystem::rename(folder_ / "away", home_ / "recordings");
+        Play({{home + "init", 0, "ready"}, {home + "mount list --json", 0, '"' + path + '"'}});
+    }
+}
+
 TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
     const std::string disk = (folder_ / "disk").string();
     std::filesystem::create_directories(disk);
