@@ -2,6 +2,11 @@
 //
 // Recorders of several hosts on one store: which of them records which camera, also when one of them is lost, cut off,
 // or drained.
+#include <algorithm>
+
+#include "standalone/store/camera_leases.h"
+#include "standalone/store/events.h"
+#include "standalone/store/hosts.h"
 #include "test/component/recorder/hosts_fixture.h"
 
 namespace lookhaven::test {
