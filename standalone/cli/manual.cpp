@@ -28,7 +28,7 @@ std::string Trimmed(const std::string& text) {
     return text.substr(begin, text.find_last_not_of(' ') + 1 - begin);
 }
 
-std::string AsSentence(std::string text) {
+std::string AsSentence(const std::string& text) {
     return text.ends_with('.') || text.empty() ? text : text + '.';
 }
 
