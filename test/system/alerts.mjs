@@ -6,6 +6,7 @@ import { address, folder, logIn, report, visit } from "./visit.mjs";
 await visit(async (page, complaints) => {
   const badge = (tab, count) => tab.waitForFunction((wanted) => document.querySelector(".nav-badge:not([hidden])")?.textContent === wanted, count);
   const unseen = (tab) => tab.locator(".nav-badge[hidden]").waitFor({ state: "attached" });
+  const lookOf = () => Object.entries(localStorage).filter(([key]) => key.startsWith("lookhaven.look")).join();
   const camera = page.locator('[data-camera="1"]');
 
   await page.goto(address);
@@ -29,9 +30,12 @@ await visit(async (page, complaints) => {
   await other.evaluate(() => void (location.hash = "#events"));
   const notice = await other.locator(".notice.shown").textContent();
   await unseen(page);
+  const look = await page.evaluate(lookOf);
   await report("looked", { notice });
   // Reported while the events are on the screen in one of the tabs.
   await other.locator(".row", { hasText: "Fourth" }).first().waitFor({ timeout: 20_000 });
+  // The list may show it before the stream of reports does, which makes it seen.
+  await page.waitForFunction(`(${lookOf})() !== ${JSON.stringify(look)}`);
   await other.close();
   await page.reload();
   await report("alone");
