@@ -56,7 +56,7 @@ Call ReadCall(const base::Installation& installation, const http::RequestCounter
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
     call.method = call.Parameter("method").asString();
-    if (const Json::Value& camera = call.Parameter("camera"); camera.isInt()) {
+    if (const Json::Value& camera = call.Parameter("camera"); call.login && camera.isInt()) {
         base::SetLogCamera(camera.asInt());
     }
     return call;

@@ -25,6 +25,8 @@ class Installation {
 
     const std::filesystem::path& Home() const { return home_; }
     std::filesystem::path RunFolder() const { return home_ / "run"; }
+    // Says where the state folder was when init ran last.
+    std::filesystem::path LocationFile() const { return home_ / "location"; }
     std::filesystem::path LogFolder() const { return home_ / "log"; }
     std::filesystem::path TlsFolder() const { return home_ / "tls"; }
     std::filesystem::path SigningKeyFile() const { return home_ / "signing" / "key.pem"; }

@@ -70,8 +70,10 @@ void Log(Severity severity, std::string_view text) noexcept try {
     if (LogsToJournal() && SendToJournal({form.priority, g_program.load(), message, t_camera, t_account})) {
         return;
     }
-    const std::string line = FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' + std::to_string(getpid()) + "] " +
-                             form.name + ": " + message + '\n';
+    // The journal takes the number for the line's priority.
+    const std::string priority = LogsToJournal() ? '<' + std::to_string(form.priority) + '>' : std::string();
+    const std::string line = priority + FormatUtc(WallMillis()) + ' ' + g_program.load() + '[' +
+                             std::to_string(getpid()) + "] " + form.name + ": " + message + '\n';
     // A log that cannot be written has nobody to tell.
     [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
 } catch (...) {

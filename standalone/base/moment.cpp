@@ -9,6 +9,7 @@ namespace lookhaven::base {
 namespace {
 
 constexpr const char* kDigits = "0123456789";
+constexpr int kMaxZoneHours = 14;
 
 // Cuts the zone off and gives its distance to UTC; nothing where there is none.
 std::optional<std::int64_t> TakeZone(std::string& text) {
@@ -27,7 +28,12 @@ std::optional<std::int64_t> TakeZone(std::string& text) {
     if (offset.size() != 4 || offset.find_first_not_of(kDigits) != std::string::npos) {
         return std::nullopt;
     }
-    const std::int64_t distance_s = std::stoi(offset.substr(0, 2)) * 3600 + std::stoi(offset.substr(2)) * 60;
+    const int hours = std::stoi(offset.substr(0, 2));
+    const int minutes = std::stoi(offset.substr(2));
+    if (hours > kMaxZoneHours || minutes > 59) {
+        return std::nullopt;
+    }
+    const std::int64_t distance_s = std::int64_t{hours} * 3600 + minutes * 60;
     const bool is_east = text[sign] == '+';
     text.resize(sign);
     return is_east ? distance_s : -distance_s;
@@ -45,13 +51,17 @@ void DropFraction(std::string& text) {
 }  // namespace
 
 std::optional<Moment> ParseMoment(std::string text) {
+    // strptime skips blanks, and stops at the first NUL.
+    if (text.empty() || text.front() < '0' || text.front() > '9' || text.find('\0') != std::string::npos) {
+        return std::nullopt;
+    }
     const std::optional<std::int64_t> east_s = TakeZone(text);
     DropFraction(text);
     for (const char* form :
          {"%Y-%m-%dT%H:%M:%S", "%Y-%m-%d %H:%M:%S", "%Y-%m-%dT%H:%M", "%Y-%m-%d %H:%M", "%Y-%m-%d"}) {
         std::tm time{};
         const char* rest = ::strptime(text.c_str(), form, &time);
-        if (rest == nullptr || *rest != '\0') {
+        if (rest == nullptr || *rest != '\0' || time.tm_sec > 59) {
             continue;
         }
         time.tm_isdst = -1;

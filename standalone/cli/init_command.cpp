@@ -9,6 +9,7 @@
 #include "standalone/admin/hosts.h"
 #include "standalone/admin/mount_claim.h"
 #include "standalone/admin/mounts.h"
+#include "standalone/base/file.h"
 #include "standalone/base/log.h"
 #include "standalone/base/state_folder.h"
 #include "standalone/cli/command_group.h"
@@ -108,11 +109,22 @@ bool AddDefaultMount(store::Store& store, const base::Installation& installation
     return true;
 }
 
-// A mount that lay in the state folder moves along with it: the folder's marker says whose it is.
+// A mount that lay in the state folder moves along with it: the folder's marker says whose it is. No other does, such
+// as one on a disk that is unplugged just now.
 void FollowStateFolder(store::Store& store, const base::Installation& installation) {
+    const std::string here = std::filesystem::canonical(installation.Home());
+    const std::filesystem::path known = installation.LocationFile();
+    const std::string before = std::filesystem::exists(known) ? base::ReadFile(known) : "";
+    if (before == here) {
+        return;
+    }
     for (const store::Mount& mount : store::Mounts(store).List()) {
         try {
-            const std::filesystem::path moved = installation.Home() / std::filesystem::path(mount.path).filename();
+            const std::filesystem::path path = mount.path;
+            if (path.parent_path() != before) {
+                continue;
+            }
+            const std::filesystem::path moved = here / path.filename();
             const maintenance::MountMarker marker = maintenance::MarkerFor(store, mount.id);
             if (mount.IsOf(installation.HostId()) && !std::filesystem::exists(mount.path) &&
                 maintenance::MountFolder::ReadMarker(moved) == marker) {
@@ -123,6 +135,7 @@ void FollowStateFolder(store::Store& store, const base::Installation& installati
             base::LogWarning(Concat("mount ", mount.id, " is not where it was: ", error.what()));
         }
     }
+    base::WriteFileAtomically(known, here);
 }
 
 // Early versions marked their mounts without saying whose they are.
@@ -179,7 +192,11 @@ void Init(const Console& console, const Request& request) {
     const bool mount_added = AddDefaultMount(store, installation, console);
     RenewMarkers(store);
     SharePictures(store, installation);
-    FollowStateFolder(store, installation);
+    try {
+        FollowStateFolder(store, installation);
+    } catch (const std::system_error& error) {  // such as a full disk, with which the services start all the same
+        base::LogWarning(std::string("cannot note where the state folder is: ") + error.what());
+    }
     const bool admin_added = !admin.empty() && AddAdmin(store, admin);
     const std::string home = installation.Home().string();
     std::string text = "The state folder " + home + " is ready.";

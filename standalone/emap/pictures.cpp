@@ -169,7 +169,7 @@ std::string Pictures::Read(const std::string& name) const {
         return ReadFile(name);
     } catch (const std::system_error&) {
         std::optional<std::string> shared = store::EmapPictures(store_).Find(name);
-        if (!shared) {
+        if (!shared || shared->size() > kMaxPictureBytes || PictureType(*shared) != name.substr(name.find('.') + 1)) {
             throw;
         }
         return *std::move(shared);

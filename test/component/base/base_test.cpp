@@ -234,7 +234,7 @@ TEST(MomentTest, IsoTimesSayTheirZoneOrAreTheHosts) {
     ::tzset();
     constexpr std::int64_t kMorning = 1'772'352'900;  // 2026-03-01T08:15:00Z
     const struct {
-        const char* text;
+        std::string text;
         std::int64_t utc_s;  // -1: refused
         bool has_zone = true;
     } rows[] = {
@@ -255,6 +255,12 @@ TEST(MomentTest, IsoTimesSayTheirZoneOrAreTheHosts) {
         {"2026-03-01T08:15.5Z", -1},
         {"2026-03-01T08:15:30.Z", -1},
         {"2026-03-01T08:15:30.2.5Z", -1},
+        {"2026-03-01T08:15:00+14:01", kMorning - 14 * 3600 - 60},
+        {"2026-03-01T08:15:00+99:00", -1},
+        {"2026-03-01T08:15:00-00:60", -1},
+        {"2026-03-01T08:15:60Z", -1},
+        {" 2026-03-01T08:15:00Z", -1},
+        {std::string("2026-03-01T08:15:30\0junk Z", 26), -1},
         {"08:15", -1},
         {"+01:00", -1},
         {"Z", -1},

@@ -14,7 +14,7 @@ import { copyable } from "./copyable";
 const kInitialCount = 10;
 /** The server tells no more. */
 const kMaxCount = 200;
-const kJournalCommand = "journalctl -u 'lookhaven-*' -g ' error: '";
+const kJournalCommand = "journalctl _UID=$(id -u lookhaven) -p err";
 
 const kTitle = "Last errors";
 
