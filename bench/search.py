@@ -30,7 +30,7 @@ NOW = int(time.time()) // DAY * DAY
 DENSE_DAYS = {count: NOW - (2000 + number) * DAY for number, count in enumerate((10, 100, 1000))}
 OLD_MONTH = NOW - 2100 * DAY
 DENSE_CAMERAS = 8
-# Of times that have more events in the larger store.
+# The measured times that have more events in the larger store.
 DIFFERENT = ("days of a month, 64 cameras", "outline of 90 days, 64 cameras")
 
 

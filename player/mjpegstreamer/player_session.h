@@ -26,7 +26,7 @@ bool SetupPlayerSignals();
 
 // The session's pid file.
 std::string PlayerPidFile();
-// Makes this process the session's player, whoever was before. False when the file cannot be opened.
+// Makes this process the session's player in place of any other. False when the file cannot be opened.
 bool WritePlayerPidFile();
 // Sets the stop flag when the file does not name this process, else clears the check flag. Returns 0, or -1 when there
 // is no session or no file.

@@ -21,7 +21,7 @@ namespace lookhaven::admin {
 // store::DeviceKindNames and store::PortTypeNames. An id is one of its kind.
 Json::Value DeviceRecord(const store::Device& device);
 
-// These two return the device as it is then.
+// AddDevice and SetDevice return the device as stored.
 store::Device AddDevice(store::Store& store, const Actor& actor, const store::Device& device);
 // seen: the record's revision that the actor saw; nothing for whatever it is. edit changes name, camera and ports; what
 // it throws ends the change.

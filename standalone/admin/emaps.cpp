@@ -55,7 +55,7 @@ void Sweep(emap::Pictures& pictures) {
     }
 }
 
-// Those of the items that are not among the others.
+// The items that are not among the others.
 Json::Value Without(const Json::Value& items, const Json::Value& others) {
     const std::set<Json::Value> known(others.begin(), others.end());
     Json::Value rest = Json::arrayValue;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The first account, made without a session by whoever holds the token that this host's owner has printed.
+// The first account, made without a session by the holder of the token that this host's owner has printed.
 //
 // Invariants    (1) At most one token is valid: a new one voids the one before.
 //               (2) None is valid, or given out, once there is an account.

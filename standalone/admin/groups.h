@@ -21,7 +21,7 @@ namespace lookhaven::admin {
 // "revision"}. Throws store::StoreError.
 Json::Value GroupRecord(store::Store& store, const store::CameraGroup& group);
 
-// These two return the group as it is then.
+// AddGroup and SetGroup return the group as stored.
 store::CameraGroup AddGroup(store::Store& store, const Actor& actor, const store::CameraGroup& group);
 // seen: the record's revision that the actor saw; nothing for whatever it is. edit changes the group, and what it
 // throws ends the change. Added cameras end the sessions of those to whom the group is denied.

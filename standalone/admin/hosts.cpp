@@ -27,7 +27,7 @@ struct Share {
     std::vector<int> floating;  // of these, what may move
 };
 
-// Of the hosts that may give and take, by id.
+// The shares, by host id, of the hosts between which cameras may be moved.
 std::map<int, Share> SharesOf(store::Store& store, const std::vector<store::Host>& hosts) {
     std::map<int, Share> shares;
     for (const store::Host& host : hosts) {
@@ -140,7 +140,7 @@ int OwnHost(store::Store& store, const base::Installation& installation) {
         return 0;
     }
     if (std::ranges::find(hosts, own, &store::Host::id) == hosts.end()) {
-        throw store::InvalidRecord("hosts share this store, and this machine is none of them: add it with lookhaven"
+        throw store::InvalidRecord("hosts share this store, and this machine is not one of them: add it with lookhaven"
                                    " host add");
     }
     return own;

@@ -55,7 +55,7 @@ int BalanceHosts(store::Store& store, const Actor& actor);
 int HostNamed(store::Store& store, const std::string& name);
 
 // This machine's id among the hosts, for what is to be its own; 0 on a store without hosts. Throws
-// store::InvalidRecord where there are hosts and it is none of them.
+// store::InvalidRecord where there are hosts and it is not one of them.
 int OwnHost(store::Store& store, const base::Installation& installation);
 
 }  // namespace lookhaven::admin

@@ -3,9 +3,9 @@
 // A code that is shown here and typed on another host, which then may show this one's cameras.
 //
 // Invariants    (1) At most one code is valid: a new one voids the one before.
-//               (2) It makes one pairing; while whoever asked for it is a manager, with the same password, whose
-//                   sessions nobody has ended; for kInvitationLifetimeS, which a clock that is set does not lengthen;
-//                   and not beyond a restart of the machine.
+//               (2) It makes one pairing; while the account that asked for it is a manager's, with the same password,
+//                   and its sessions were not ended; for kInvitationLifetimeS, which setting the clock does not
+//                   lengthen; and not beyond a restart of the machine.
 //               (3) The store holds the digest of its secret only.
 //               (4) Wrong guesses, however many, void no code, and change nothing.
 #pragma once
@@ -41,10 +41,10 @@ void VoidInvitationOf(store::Store& store, int user_id);
 // guessed. Reads alone.
 void RequireInvitation(store::Store& store, const base::BootTime& now);
 
-// Makes the pairing for whoever knows the secret of the code, which may hold any bytes, and returns the secret that the
-// two hosts share from now on. address: where the request came from. Of any number of callers at once, one makes it.
-// Throws InvalidInvitation, without waiting for anybody's change where the secret is wrong; store::AlreadyExists where
-// the name has been given to a host of the other kind meanwhile, after which the code is still valid.
+// Makes the pairing for a caller who knows the secret of the code, which may hold any bytes, and returns the secret
+// that the two hosts share from now on. address: where the request came from. Of several callers at once, one makes
+// it. Throws InvalidInvitation, without waiting for anybody's change where the secret is wrong; store::AlreadyExists
+// where the name has been given to a host of the other kind meanwhile, after which the code is still valid.
 std::string AcceptInvitation(store::Store& store, std::string_view secret, const std::string& address,
                              const base::BootTime& now);
 

@@ -20,7 +20,7 @@
 namespace lookhaven::admin {
 
 const base::Names<int>& LogLevels();
-// Those that have a name; each of the 512 has a number.
+// The categories that have a name; each of the 512 has a number.
 const base::Names<int>& LogCategories();
 
 // The level of most categories, which are unused; and those that have a name, or another level than most.

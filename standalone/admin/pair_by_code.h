@@ -13,8 +13,8 @@
 
 namespace lookhaven::admin {
 
-// Nothing was changed here; there, with kUnclear, a pairing may have been made. Whoever may pair can name any address
-// that this machine reaches, so the text says no more of what answers there than the reason.
+// Nothing was changed here; there, with kUnclear, a pairing may have been made. A manager can name any address that
+// this machine reaches, so the text says no more of what answers there than the reason.
 class CannotPair : public std::runtime_error {
   public:
     enum class Reason {

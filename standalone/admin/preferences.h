@@ -13,7 +13,7 @@
 
 namespace lookhaven::admin {
 
-// Of all preferences of an account, as base::OneLineJson writes them.
+// The limit for all preferences of an account together, as base::OneLineJson writes them.
 constexpr std::size_t kMaxPreferencesBytes = 16'384;
 constexpr std::size_t kMaxPreferences = 64;
 constexpr int kMaxPreferenceDepth = 8;

@@ -62,7 +62,7 @@ Change RemoveMark(store::Store& store, const store::Mark& mark) {
         "event.remove", ObjectOf(store, what, mark.camera_id, mark.id), was_there ? SpanOf(mark) : Json::Value(), {}};
 }
 
-// It names recordings, and holds none.
+// A span file names the recordings of a mark's footage; it holds no footage itself.
 void RemoveSpanFile(store::Store& store, const store::Mark& mark) {
     const auto name = archive::ParsePath(mark.path);
     const auto mount = store::Mounts(store).Find(mark.mount_id);

@@ -45,15 +45,15 @@ std::span<const Setting> Settings();
 // there is one. min and max are null where there are none. operator: only the command line may change it.
 Json::Value SettingRecord(store::Store& store, const Setting& setting);
 
-// Returns the record as it is then. value: as in the record, but for a token. seen: the record's revision that the
-// actor saw; nothing for whatever it is. Throws Stale; store::NotFound for a name that is none; store::InvalidRecord,
+// Returns the record as stored. value: as in the record, but for a token. seen: the record's revision that the
+// actor saw; nothing for whatever it is. Throws Stale; store::NotFound for an unknown name; store::InvalidRecord,
 // which names the bounds, for another value; Forbidden for the operator's settings, unless the actor is the command
 // line.
 Json::Value SetSetting(store::Store& store, const Actor& actor, const std::string& name,
                        std::optional<std::int64_t> seen, const Json::Value& value);
 
 // Replaces the monitors' token by a new one, which is returned and stored nowhere, or by none: then the text is empty.
-// For the command line alone.
+// Only for the command line.
 std::string SetMonitorToken(store::Store& store, const Actor& actor, bool is_new);
 
 }  // namespace lookhaven::admin

@@ -90,7 +90,7 @@ std::optional<binding::Login> FindLogin(const Call& call) {
         if (call.request.Header("REQUEST_METHOD") == "GET" && call.Parameter("api") == kSelfAdmittingApi) {
             return std::nullopt;
         }
-        throw Failure(403, "another site's page may not ask for this");
+        throw Failure(403, "pages of other sites may not send this request");
     }
     const auto cookie = call.cookies.find(SessionCookie(call.request));
     if (cookie == call.cookies.end() || !store::Sessions::MayBeSecret(cookie->second)) {

@@ -22,7 +22,7 @@ namespace lookhaven::api {
 
 namespace {
 
-// Where cameras of many makes have their streams.
+// The paths at which cameras of many makes offer their streams.
 constexpr std::array<std::pair<const char*, const char*>, 12> kUsualPaths{{
     {"first stream", "/stream1"},
     {"second stream", "/stream2"},

@@ -12,7 +12,7 @@
 namespace lookhaven::api {
 
 // Changes in the setup what the call names. A stored password goes to no other server (scheme, host, port) than those
-// that the camera has, nor to one whose certificate is no longer verified: whoever may replace it may not read it.
+// that the camera has, nor to one whose certificate is no longer verified: a user who may replace it may not read it.
 // Throws Failure 400.
 void TakeCameraFields(const Call& call, admin::CameraSetup& setup);
 

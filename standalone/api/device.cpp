@@ -45,7 +45,7 @@ void TakeDeviceFields(const Call& call, Device& device) {
         TakeNamed(port["type"], "port.type", store::PortTypeNames(), taken.type);
         Take(port["camera"], "port.camera", taken.camera_id);
         if (port["type"].isNull() || !device.ports.emplace(port["port"].asInt(), taken).second) {
-            throw Failure(400, "each port must be there once, with its type");
+            throw Failure(400, "each port must be listed once, with its type");
         }
     }
 }

@@ -63,7 +63,7 @@ std::string RequireName(const Call& call) {
 
 emap::MapPicture DrawnPicture(const Call& call) {
     if (!IsPictureUpload(call)) {
-        throw Failure(400, "the body must be the picture's file, and its Content-Type no form's");
+        throw Failure(400, "the body must be the picture's file, and its Content-Type not that of a form");
     }
     if (!call.slots.BeginProbing(call.slot, kMaxConcurrent)) {
         throw Failure(429, "three pictures or cameras are being processed already; try again in a moment",

@@ -4,12 +4,14 @@
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
+#include <limits>
 #include <optional>
 
 #include "platform/camera/camgroup.h"
 #include "platform/recording/eventsearch.h"
 #include "standalone/api/download.h"
 #include "standalone/api/event_json.h"
+#include "standalone/api/event_kinds.h"
 #include "standalone/api/export.h"
 #include "standalone/api/footage.h"
 #include "standalone/api/keep.h"
@@ -34,7 +36,7 @@ constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
 constexpr int kMaxSteps = 20'000;
 constexpr std::int64_t kMaxStepSeconds = 86'400;
-constexpr std::size_t kMaxCameras = 1'000;  // asked for by their ids: each costs a query
+constexpr std::size_t kMaxCameras = 1'000;  // that a call may name
 
 // One text, or a list of lines.
 std::string TextOf(const Json::Value& text) {
@@ -83,7 +85,7 @@ std::int64_t StartOf(const Call& call, std::int64_t now_s) {
     return moment->utc_s;
 }
 
-// What is reported is evidence: of a time of which there may be footage.
+// A report is evidence, so its time must be one of which there may be footage.
 void RequirePlausible(const Call& call, int camera, std::int64_t start_s, std::int64_t now_s) {
     if (start_s > now_s + kMaxAheadSeconds) {
         throw Failure(400, "start lies in the future");
@@ -95,7 +97,7 @@ void RequirePlausible(const Call& call, int camera, std::int64_t start_s, std::i
     }
 }
 
-std::string MarkIt(const Call& call) {
+std::string Report(const Call& call) {
     const auto kind = KindOf(call);
     if (!kind) {
         throw Failure(400, "kind must be alert or pos");
@@ -214,7 +216,7 @@ std::string Outline(const Call& call) {
     for (const int camera : CamerasOf(call)) {
         const store::Outline outline = store::OutlineOf(call.Records(), camera, begin_s, end_s, step_s);
         if (outline.IsEmpty()) {
-            continue;  // as a camera that the caller may not see, or that there is not
+            continue;  // like a camera that the caller may not see, or that does not exist
         }
         Json::Value& json = data["camera"].append(Json::objectValue);
         json["camera_id"] = camera;
@@ -226,50 +228,8 @@ std::string Outline(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// What the parameter "kinds" names, as a list; all when it is missing.
-struct Kinds {
-    bool continuous = true;
-    bool alarm = true;
-    bool alert = true;
-    bool pos = true;
-
-    explicit Kinds(const Json::Value& asked) {
-        if (asked.isNull()) {
-            return;
-        }
-        continuous = alarm = alert = pos = false;
-        const std::string text = asked.asString();
-        for (std::size_t at = 0; at < text.size();) {
-            const std::size_t end = std::min(text.find(',', at), text.size());
-            Choose(text.substr(at, end - at));
-            at = end + 1;
-        }
-    }
-
-    void Choose(const std::string& name) {
-        bool* const kind = name == "continuous" ? &continuous
-                           : name == "alarm"    ? &alarm
-                           : name == "alert"    ? &alert
-                           : name == "pos"      ? &pos
-                                                : nullptr;
-        if (kind == nullptr) {
-            throw Failure(400, "kinds must be of continuous, alarm, alert and pos");
-        }
-        *kind = true;
-    }
-
-    store::Reasons Reasons() const {
-        return continuous && alarm ? store::Reasons::kAny
-               : continuous        ? store::Reasons::kContinuous
-                                   : store::Reasons::kOthers;
-    }
-    std::optional<store::MarkKind> OnlyMark() const {
-        return alert && pos ? std::nullopt : std::optional(alert ? store::MarkKind::kAlert : store::MarkKind::kPos);
-    }
-};
-
 std::string Next(const Call& call) {
-    const Kinds kinds(call.Parameter("kinds"));
+    const EventKinds kinds(call.Parameter("kinds"));
     const Json::Value& before = call.Parameter("before");
     store::Step step{.camera_ids = CamerasOf(call)};
     step.start_s = call.NumberOr("time", base::WallSeconds());
@@ -290,13 +250,13 @@ std::string Next(const Call& call) {
     return SuccessAnswer(data);
 }
 
-constexpr Method kMethods[] = {{"Mark", MarkIt, Method::Accepts::kPostOnly},
+constexpr Method kMethods[] = {{"Mark", Report, Method::Accepts::kPostOnly},
                                {"List", List},
                                {"Outline", Outline},
                                {"Watch", Watch},
                                {"Get", Get},
                                {"Next", Next},
-                               {"Frame", TellFrame},
+                               {"Frame", FrameAtTime},
                                {"Keep", Keep, Method::Accepts::kPostOnly},
                                {"Download", Download},
                                {"Stream", Stream},

@@ -114,7 +114,7 @@ int RequestedFrame(const Call& call, const archive::RecordingReader& recording) 
     return frame;
 }
 
-std::string TellFrame(const Call& call) {
+std::string FrameAtTime(const Call& call) {
     const std::int64_t time_ms = call.NumberOr("time_ms", 0);
     const Footage footage = RequireFootage(call);
     const archive::RecordingReader recording = OpenFootage(call, footage, time_ms);

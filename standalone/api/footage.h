@@ -53,6 +53,6 @@ int FrameAt(const archive::RecordingReader& recording, std::int64_t time_ms);
 int RequestedFrame(const Call& call, const archive::RecordingReader& recording);
 
 // The method Frame of VEXO.Event.
-std::string TellFrame(const Call& call);
+std::string FrameAtTime(const Call& call);
 
 }  // namespace lookhaven::api

@@ -29,10 +29,10 @@ constexpr std::chrono::seconds kMaxSilentLive{60};
 constexpr int kLiveReceiveBytes = 64 << 10;
 constexpr std::size_t kMaxTagBytes = 100;
 constexpr int kBadGateway = 502;
-// A player answers within a second, and each host is asked.
+// Per host; a player answers within a second.
 constexpr std::chrono::seconds kMaxSearch{3};
 constexpr std::chrono::milliseconds kDrainPoll{3};
-// A picture comes in pieces, which belong together.
+// A picture arrives in several pieces within this time.
 constexpr std::chrono::milliseconds kPictureTime{20};
 
 bool IsPrintable(std::string_view text) {
@@ -122,7 +122,7 @@ class AnswerForwarder : public remote::AnswerSink {
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
-    // The other web server's answer while its host is offline, or that host's own.
+    // Whether the other web server answered for a host that is offline, or that host did itself.
     bool IsBadGateway() const { return status_ == kBadGateway; }
     bool IsWithheld() const {
         const bool is_of_player = status_ < 400 || status_ == 400 || status_ == 409;

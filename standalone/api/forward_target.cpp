@@ -22,7 +22,7 @@ namespace lookhaven::api {
 
 namespace {
 
-// Of all hosts that are asked for a player; the last may take three seconds more.
+// How long hosts are asked for a player, one after another; the last may take three seconds more.
 constexpr std::chrono::seconds kMaxSearch{9};
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 

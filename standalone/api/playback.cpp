@@ -98,7 +98,7 @@ std::string SetRate(const Call& call) {
     const control::RequestRef player_request = AwaitPlayer(call);
     const control::Player& player = player_request.slot->player;
     if (!player.takes_rate) {
-        throw Failure(409, "this player does not take its rate from here");
+        throw Failure(409, "the rate of this player cannot be changed");
     }
     const control::SharedLock lock = LockPlayers(call);
     bool waits = false;
@@ -117,7 +117,7 @@ std::string SetRate(const Call& call) {
 std::string GetPosition(const Call& call) {
     const control::Player& player = AwaitPlayer(call).slot->player;
     if (!player.tells_position) {
-        throw Failure(409, "this player does not tell its position here");
+        throw Failure(409, "this player does not report its position");
     }
     const int position_ms = ProgressOf(call, player).Get();
     Json::Value data;

@@ -81,7 +81,7 @@ std::string Check(const Call& call) {
         throw Failure(404, "there is no such host");
     }
     if (server->address.empty()) {
-        throw Failure(400, "this host asks that one for cameras: it has no address to be asked at");
+        throw Failure(400, "that host connects to this one, so it has no address to check");
     }
     const std::string secret = servers.FindSecret(server->id);
     std::string reason = "the pairing is disabled";

@@ -30,17 +30,17 @@ void AddStates(MetricsText& text, const base::Installation& installation, store:
         }
     }
     const std::vector<store::CameraLease> leases = store::CameraLeases(records).List();
-    text.Family("lookhaven_host_cameras", "gauge", "Cameras whose lease the host has.");
+    text.Family("lookhaven_host_cameras", "gauge", "Cameras whose lease the host holds.");
     for (const store::Host& host : hosts) {
         text.Sample(static_cast<double>(std::ranges::count(leases, host.id, &store::CameraLease::host_id)),
                     {{"host", host.name}});
     }
-    text.Family("lookhaven_cameras_without_host", "gauge", "Enabled cameras whose lease no host has.");
+    text.Family("lookhaven_cameras_without_host", "gauge", "Enabled cameras whose lease no host holds.");
     text.Sample(static_cast<double>(
         std::ranges::count_if(leases, [](const auto& lease) { return lease.enabled && lease.host_id == 0; })));
 }
 
-// As PostgreSQL tells it.
+// What PostgreSQL reports of its replication.
 void AddReplication(MetricsText& text, store::Store& records) {
     const auto replication = store::ReadReplication(records);
     if (!replication) {
@@ -50,10 +50,10 @@ void AddReplication(MetricsText& text, store::Store& records) {
     text.Sample(replication->is_standby ? 1 : 0);
     text.Family("lookhaven_store_standbys", "gauge", "Standbys that are connected to the database server.");
     text.Sample(replication->standbys);
-    if (replication->told > 0) {  // which takes a right of its own
-        text.Family("lookhaven_store_standbys_streaming", "gauge", "Of these, those that follow it.");
+    if (replication->visible > 0) {  // which takes a right of its own
+        text.Family("lookhaven_store_standbys_streaming", "gauge", "Standbys that stream from the database server.");
         text.Sample(replication->streaming);
-        text.Family("lookhaven_store_standby_lag_bytes", "gauge", "By how much the last of them is behind.");
+        text.Family("lookhaven_store_standby_lag_bytes", "gauge", "How far the slowest of these is behind.");
         text.Sample(static_cast<double>(replication->lag_bytes));
     }
 }

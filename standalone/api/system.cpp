@@ -44,7 +44,7 @@ store::Store* TryToOpen(const Call& call) {
     try {
         return &call.Records();
     } catch (const store::StoreError& error) {
-        base::LogError(std::string("a monitor asks, and the record store cannot be opened: ") + error.what());
+        base::LogError(std::string("the record store cannot be opened for a monitoring request: ") + error.what());
         return nullptr;
     }
 }
@@ -78,7 +78,7 @@ store::Store* AdmitMonitor(const Call& call) {
     }
     if (call.slots.BeginRequest(call.slot, kMonitorUserId, kMaxMonitors, std::numeric_limits<std::size_t>::max()) !=
         control::QuotaResult::kGranted) {
-        throw Failure(503, "too many monitors are asking", http::kRetrySoonSeconds);
+        throw Failure(503, "too many monitoring requests are running", http::kRetrySoonSeconds);
     }
     store::Store* const records = TryToOpen(call);
     if (!is_from_here && records == nullptr) {
@@ -146,7 +146,8 @@ std::string Status(const Call& call) {
     admin::RequireManager(call.Records(), call.Actor());
     if (call.slots.BeginRequest(call.slot, kStatusUserId, kMaxConcurrent, std::numeric_limits<std::size_t>::max()) !=
         control::QuotaResult::kGranted) {
-        throw Failure(503, "others are looking at the state just now", http::kRetrySoonSeconds);
+        throw Failure(503, "the system status is being read for others; try again in a moment",
+                      http::kRetrySoonSeconds);
     }
     return SuccessAnswer(SystemStatus(call));
 }

@@ -31,7 +31,7 @@ int IdOf(const Call& call) {
     return call.Parameter("id").asInt();
 }
 
-// With how it is used, which is no part of what its revision stands for.
+// The record with the account's use, which its revision does not cover.
 Json::Value WithUse(Json::Value record, const std::map<int, store::Sessions::Use>& uses) {
     const auto use = uses.find(record["id"].asInt());
     record["sessions"] = use == uses.end() ? 0 : use->second.sessions;
@@ -87,7 +87,7 @@ std::string List(const Call& call) {
     return SuccessAnswer(data);
 }
 
-// Without the password.
+// The changes except the password.
 admin::UserChange RightsOf(const Call& call) {
     admin::UserChange change;
     if (const Json::Value& privilege = call.Parameter("privilege"); !privilege.isNull()) {

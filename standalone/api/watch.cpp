@@ -59,9 +59,9 @@ std::optional<Place> PlaceOf(const Call& call) {
     return place;
 }
 
-// What there is behind a mark.
+// The marks after a given one.
 struct Backlog {
-    int last = 0;    // the newest mark, whoever may see it
+    int last = 0;    // the newest mark, even if the caller may not see it
     int missed = 0;  // how many the caller may see, …
     int newest = 0;  // … of these the last …
     int oldest = 0;  // … and the first

@@ -64,9 +64,9 @@ class EbmlReader {
         }
         return true;
     }
-    // Of the first eight bytes.
+    // The number in the first eight bytes.
     std::uint64_t Unsigned(const Element& element);
-    // Of the first 64 bytes, up to a zero.
+    // The text in the first 64 bytes, up to a zero byte.
     std::string Text(const Element& element);
     // Reads again what may have changed since.
     void Forget() { window_.clear(); }

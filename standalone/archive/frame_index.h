@@ -79,7 +79,7 @@ class FrameIndexReader {
   public:
     // Throws std::system_error when the file cannot be opened, ArchiveError when it is no frame index.
     explicit FrameIndexReader(const std::filesystem::path& path);
-    // Of an open file; the path is for messages.
+    // Reads an open file; the path is for messages only.
     FrameIndexReader(base::FileDescriptor file, std::string path);
 
     const IndexHeader& Header() const { return header_; }

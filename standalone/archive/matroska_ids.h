@@ -32,7 +32,7 @@ constexpr std::uint32_t kCues = 0x1C53BB6B;
 constexpr std::uint32_t kTags = 0x1254C367;
 constexpr std::uint32_t kVoid = 0xEC;
 
-// Of a block's flags: more than one frame in it.
+// Set in a block's flags when it holds more than one frame.
 constexpr std::uint8_t kLacingFlags = 0x06;
 
 }  // namespace lookhaven::archive::matroska

@@ -28,7 +28,7 @@ base::FileDescriptor OpenFile(const std::filesystem::path& path, int flags, unsi
 base::FileDescriptor OpenFileInNewDay(const std::filesystem::path& path, int flags, unsigned int mode = 0640);
 
 std::uint64_t SizeOf(const base::FileDescriptor& file, const std::filesystem::path& path);
-// At most the file's first max_bytes bytes.
+// Reads at most the file's first max_bytes bytes.
 std::string ReadFile(const std::filesystem::path& path, std::size_t max_bytes);
 // Replaces the file in one step, and what else has its name, but for a folder.
 void WriteFileAtomically(const std::filesystem::path& path, std::string_view contents, unsigned int mode = 0640);

@@ -37,8 +37,9 @@ struct RecordingPart {
     std::int64_t LastWallMs() const { return header.start_wall_ms + last_ms; }
 };
 
-// Of a growing recording, what there is. Nothing for a missing bound means its start or its end. Nothing when the
-// recording has no frame in the span. Throws std::system_error when recording or index cannot be opened, ArchiveError.
+// The recording's part in the span, whose bounds default to its start and end; of a growing recording, what there is
+// now. Nothing when it has no frame in the span. Throws std::system_error when recording or index cannot be opened,
+// ArchiveError.
 std::optional<RecordingPart> PartOf(const std::filesystem::path& recording, std::optional<std::int64_t> begin_wall_ms,
                                     std::optional<std::int64_t> end_wall_ms);
 

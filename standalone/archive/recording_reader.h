@@ -60,7 +60,7 @@ class RecordingReader {
     // The frame of a valid index. Valid until Refresh.
     const RecordedFrame& At(int index) const { return frames_.at(static_cast<std::size_t>(index)); }
 
-    // Of one segment. Its entries are in decoding order and begin with a key frame.
+    // One segment: its entries are in decoding order and begin with a key frame.
     const IndexHeader& Header(std::uint32_t segment) const;
     std::span<const FrameEntry> Entries(std::uint32_t segment) const;
     const std::filesystem::path& PathOf(std::uint32_t segment) const;

@@ -69,7 +69,7 @@ std::string SqliteUrl(const fs::path& path) {
     return "sqlite:" + path.string();
 }
 
-// Of the manifest, of a file of the certificate, of the signing key, and of how many files there may be.
+// Limits: the size of the manifest, of each certificate file and of the signing key; and the number of files.
 constexpr std::uintmax_t kMaxTextBytes = std::uintmax_t{1} << 20U;
 constexpr std::size_t kMaxFiles = 10'000;
 
@@ -113,7 +113,8 @@ std::vector<fs::path> FilesOf(const std::string& folder, const fs::path& path) {
     return files;
 }
 
-// As they belong together. Copied first, for whoever replaces them must not wait for where the backup goes.
+// Copies certificate and key under the lock, so that they match. Copied first, so that replacing them need not wait
+// for the backup's destination.
 void CopyKeys(const base::Installation& installation, const WorkFolder& folder) {
     const base::FileDescriptor lock = base::LockFile(installation.CertificateLockFile());
     for (const auto& [name, path] : {std::pair{kCertificate, installation.TlsFolder()},

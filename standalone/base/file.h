@@ -34,9 +34,9 @@ void WriteFileAtomically(const std::filesystem::path& path, std::string_view con
 // destructor; the file stays. The constructors throw std::system_error.
 class SharedMapping {
   public:
-    // Of the file's first size_bytes bytes; a missing file is created and a short one lengthened, with zeros.
+    // Maps the file's first size_bytes bytes; a missing file is created, and a short one filled up with zeros.
     SharedMapping(const std::filesystem::path& path, std::size_t size_bytes, unsigned int mode = 0600);
-    // Of an open file, which must be that long: touching a page behind its end is SIGBUS.
+    // Maps an open file, which must be that long: touching a page behind its end raises SIGBUS.
     SharedMapping(const FileDescriptor& file, std::size_t size_bytes, bool read_only = false);
     SharedMapping(SharedMapping&& other) noexcept;
     SharedMapping& operator=(SharedMapping&& other) noexcept;

@@ -103,7 +103,7 @@ void Installation::SetStoreUrl(const std::string& url) const {
     } else {
         WriteFileAtomically(override_file, url + "\n");
     }
-    // Else a power cut may bring the other store back.
+    // Without this a power cut may bring the other store back.
     SyncFolder(home_);
 }
 

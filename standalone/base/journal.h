@@ -20,8 +20,8 @@ struct JournalEntry {
 
 constexpr const char* kJournalSocket = "/run/systemd/journal/socket";
 
-// False when the journal does not take it at once, or a confined process may open no socket. Opens no descriptor for
-// longer than that. Throws std::bad_alloc.
+// False when the journal does not take it at once, or a confined process may open no socket. Leaves no descriptor
+// open. Throws std::bad_alloc.
 bool SendToJournal(const JournalEntry& entry, const char* socket = kJournalSocket);
 
 }  // namespace lookhaven::base

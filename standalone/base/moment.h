@@ -11,7 +11,7 @@ namespace lookhaven::base {
 
 struct Moment {
     std::int64_t utc_s = 0;
-    bool has_zone = false;  // else it was taken in the host's time zone
+    bool has_zone = false;  // without one the host's time zone was used
 };
 
 // "2026-03-01", "2026-03-01 08:15", "2026-03-01T08:15:30", "2026-03-01T08:15:30.250", which is cut to the second;

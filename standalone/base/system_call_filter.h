@@ -26,8 +26,8 @@ constexpr ArgumentCondition ArgumentIsNot(unsigned argument, int value) {
     return {argument, value, ~0, true};
 }
 
-// As a value: the id of the process that installs it, whoever made the filter. No process has this one. Compare without
-// a mask; any other use of this value in a filter is replaced, too.
+// Stands for the id of the process that installs the filter, even if another one made it. No process has this id.
+// Compare without a mask; any other use of this value in a filter is replaced, too.
 constexpr int kOwnProcess = 0x7fffff1d;
 
 class SystemCallFilter {

@@ -23,7 +23,7 @@ enum class BrokenEscape { kRefuse, kKeep };
 // it is with kKeep, else there is no result. The result may hold any bytes.
 std::optional<std::string> DecodeForm(std::string_view text, BrokenEscape broken_escape);
 
-// With padding, without line breaks; FromBase64 takes nothing else.
+// Base64 with padding and without line breaks; FromBase64 takes nothing else.
 std::string ToBase64(std::string_view bytes);
 std::optional<std::string> FromBase64(std::string_view text);
 

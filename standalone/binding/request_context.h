@@ -42,7 +42,7 @@ struct RequestEvents {
     std::function<void(const std::string& secret)> on_paired_host = [](const std::string&) {};
 };
 
-// The rights that a request's "privData" leaves to its caller, whoever that is.
+// The rights that a request's "privData" leaves to its caller.
 struct Restrictions {
     std::set<int> cameras;                                  // denied, for every kind of access
     std::set<int> sound;                                    // of these the sound alone
@@ -55,7 +55,7 @@ struct Restrictions {
     void AddTo(std::set<int>& denied, store::CameraAccess kind) const;
 };
 
-// A picture of a recording in the buffer of whoever asked for it.
+// A picture of a recording, in the caller's buffer.
 struct RecordedPicture {
     const void* data = nullptr;
     std::int64_t captured_ms = 0;  // wall clock

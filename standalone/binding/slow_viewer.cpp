@@ -18,7 +18,7 @@ namespace {
 
 // A muxed stream needs each frame, so it falls behind on a slow connection; from here on it skips to a key frame.
 constexpr std::int64_t kMaxBehindMs = 2'000;
-// The stream is not to end by the time-out of who writes nothing for twenty seconds.
+// Shorter than the time-out of twenty seconds without a write, which would end the stream.
 constexpr std::int64_t kMaxSoundPauseUs = 10'000'000;
 
 bool IsDrained() {
@@ -31,8 +31,8 @@ bool TakeOverduePicture() {
     return queue != nullptr && queue->TakeOverduePicture();
 }
 
-// Waits until what was sent before has left, or a picture is overdue. The milliseconds that are left of a ring's
-// longest wait; nothing when neither came about, or a signal came.
+// Waits until what was sent before has left, or a picture is overdue. Returns the milliseconds that are left of a
+// ring's longest wait; nothing when neither happened in time, or a signal came.
 std::optional<int> AwaitDrained() {
     constexpr timespec kPoll{0, 3'000'000};
     const std::int64_t until_us = base::MonotonicMicros() + ring::kMaxWaitMillis * 1000;
@@ -52,7 +52,7 @@ bool IsBehind(const ring::Entry& entry) {
     return AgeMs(entry) > kMaxBehindMs;
 }
 
-// How the muxed stream of this process stands.
+// How far the muxed stream of this process lags.
 struct Lag {
     std::int64_t max_behind_ms = 0;  // 0: the stream has not begun
     bool is_held_back = false;       // a slow connection kept it from the newest frame
@@ -68,8 +68,8 @@ void BeginLag(void* stream) {
     ring::ReadIFrameFinish(stream, key, nullptr);
 }
 
-// Whether the entry is left out: where a slow connection has made a stream late it goes on at the first key frame that
-// is not.
+// Whether the entry is left out: a stream that a slow connection has made late continues at the first key frame that
+// is not late.
 bool IsSkipped(const ring::Entry& entry) {
     const bool is_key = (entry.flags & ring::kKeyFrame) != 0;
     if (is_key || !IsBehind(entry)) {
@@ -81,7 +81,7 @@ bool IsSkipped(const ring::Entry& entry) {
     return g_lag.is_skipping;
 }
 
-// After ten seconds without a frame whatever is older is skipped, so only such a key frame can use the turn.
+// After ten seconds without a frame all older ones are skipped, so only a fresh key frame can be sent then.
 bool HasFreshKeyFrame(void* stream) {
     const ring::Entry* entry = ring::ReadLatestIFrame(stream);
     const bool is_fresh = entry != nullptr && !IsBehind(*entry);

@@ -15,10 +15,10 @@ namespace lookhaven::camera {
 std::unique_ptr<media::Source> OpenIsolated(const std::string& url, const media::SourceOptions& options,
                                             std::stop_token stop);
 
-// Those of the network, isolated; needs no libav.
+// The kinds of the network, isolated; needs no libav.
 media::SourceKinds NetworkKinds();
 
-// media::CameraKinds, those of the network isolated.
+// media::CameraKinds, in which the kinds of the network are isolated.
 media::SourceKinds IsolatedKinds();
 
 }  // namespace lookhaven::camera

@@ -2,9 +2,9 @@
 //
 // Reads what a camera's process sends and trusts none of it.
 //
-// Why so        The process parses what the camera sends, so it may be in the hands of whoever is in the camera. Beyond
-//               this reader a packet has what media::Packet promises: a known codec, a size within its limits, a time
-//               near now.
+// Why so        The process parses what the camera sends, so an attacker who controls the camera may control it too.
+//               Beyond this reader a packet has what media::Packet promises: a known codec, a size within its limits,
+//               a time near now.
 #pragma once
 
 #include <cstdint>
@@ -47,7 +47,7 @@ class MessageReader {
     std::optional<media::StreamFormat> ReadFormat(const MessageHead& head) const;
     media::Packet ReadFrame(const MessageHead& head) const;
 
-    // Of the last message.
+    // The body of the message read last.
     std::span<const std::uint8_t> Body(const MessageHead& head) const {
         return {buffer_.data() + begin_ - head.body_bytes, head.body_bytes};
     }

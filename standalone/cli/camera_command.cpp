@@ -66,7 +66,7 @@ media::ProbeResult Probe(const std::string& source, bool insecure,
     return admin::ProbeStream(OpenAndProbe, pattern::AllSourceKinds(), source, insecure, credentials);
 }
 
-// None without an account, and for an empty one, which removes the stored one.
+// Asks for the password; nothing without an account, and for an empty one, which removes the stored credentials.
 std::optional<store::Credentials> AskCredentials(const Request& request) {
     if (!request.account || request.account->empty()) {
         return std::nullopt;

@@ -23,7 +23,7 @@ class CameraOptions {
 
     bool HasType() const { return type_.has_value(); }
     bool HasAudio() const { return audio_.has_value(); }
-    // Of the profile of that number; also where it is the same as before.
+    // Whether a source was given for the profile of that number, even the one that it had before.
     bool HasSource(int profile) const { return profiles_[static_cast<std::size_t>(profile)].source.has_value(); }
 
   private:

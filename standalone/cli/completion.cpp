@@ -8,7 +8,7 @@ namespace lookhaven::cli {
 
 namespace {
 
-// Of the command or of one around it, which it inherits; null when there is none.
+// The option of that name of the command, or one that it inherits from a parent command; null when there is none.
 const CLI::Option* FindOption(const CLI::App& command, const std::string& name) {
     for (const CLI::App* app = &command; app != nullptr; app = app->get_parent()) {
         if (const CLI::Option* option = app->get_option_no_throw(name)) {

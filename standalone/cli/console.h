@@ -20,7 +20,7 @@ namespace lookhaven::cli {
 enum ExitCode : int {
     kOk = 0,
     kFindings = 1,  // the doctor or verify found something
-    kUnproven = 2,  // nothing speaks against the export, but nobody known has signed it
+    kUnproven = 2,  // nothing speaks against the export, but it is not signed by a known key
     kUsage = 64,
     kDataError = 65,
     kNoInput = 66,

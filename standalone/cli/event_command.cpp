@@ -136,7 +136,7 @@ void Show(const Console& console, const Request& request) {
     console.Answer(data, text);
 }
 
-// Of an alert or a POS transaction, the recordings that its footage lies in.
+// Applies the change to the recording, or to the recordings that hold the footage of an alert or POS transaction.
 void ChangeKeeping(const Console& console, const Request& request, const auto& change, const char* what) {
     store::Store store = console.OpenStore();
     const Found found = RequireEvent(store, request.id);

@@ -50,7 +50,7 @@ std::string LineOf(const Json::Value& mark) {
     return text.substr(0, text.find('\n'));
 }
 
-// Nothing for a mark of the command line.
+// Empty for a mark made on the command line.
 std::string ReporterText(const store::Mark& mark) {
     return mark.reporter.name.empty()
                ? ""

@@ -41,7 +41,7 @@ const char* NameOf(Signer signer) {
 std::string SentenceOf(Signer signer, const std::string& fingerprint) {
     switch (signer) {
     case Signer::kNobody:
-        return "Nobody signed it: whoever changes a file can change its hash as well.";
+        return "It is not signed: anybody who changed a file could have changed its hash as well.";
     case Signer::kUnknown:
         return "Signed by a key that this host does not know, " + fingerprint +
                ": anybody can make one. Compare it with what lookhaven export key shows on the host that the export is"
@@ -60,7 +60,7 @@ constexpr const char* kNotProved =
     "Not proved: that the host and its clock were right and untouched before the export, that its recordings are what"
     " the cameras saw, and who used the account that the manifest names.";
 
-// Of this host's key; empty where there is none that may be read: whoever verifies need not have an installation.
+// The fingerprint of this host's key; empty where there is none that may be read: verifying needs no installation.
 std::string OwnFingerprint(const Console& console) try {
     const evidence::SignatureLibrary& library = evidence::LoadSignatureLibrary();
     return library.FingerprintOf(library.PublicKeyOf(base::Installation(console.HomePath()).SigningKeyFile()));
@@ -112,7 +112,7 @@ void Verify(const Console& console, const Request& request) {
         throw Failure(kFindings, "this export is not signed by the key that you named");
     }
     if (signer == Signer::kNobody || signer == Signer::kUnknown) {
-        throw Failure(kUnproven, "nobody known has signed this export");
+        throw Failure(kUnproven, "this export is not signed by a known key");
     }
 }
 

@@ -11,7 +11,7 @@ namespace lookhaven::cli {
 struct ExportVerification {
     int files = 0;                    // that are as the manifest says
     std::vector<std::string> faults;  // a sentence each
-    // Of the key that signed the manifest: 64 hexadecimal digits. Empty when nobody did, or not this manifest.
+    // The fingerprint of the key that signed the manifest: 64 hexadecimal digits. Empty without a valid signature.
     std::string fingerprint;
 };
 

@@ -31,7 +31,7 @@ struct Request {
     bool ahead = false;
 };
 
-// What an attempt that was cut off has left.
+// As an interrupted attempt leaves it.
 bool HoldsEmptyFoldersOnly(const std::string& home) {
     std::error_code error;
     return std::ranges::all_of(std::filesystem::directory_iterator(home, error), [](const auto& entry) {
@@ -40,7 +40,7 @@ bool HoldsEmptyFoldersOnly(const std::string& home) {
     });
 }
 
-// Where other things lie, neither our files belong nor is anything ours to change.
+// A folder with other files in it is not ours to use or change.
 void RequireOwnFolder(const std::string& home) {
     std::error_code error;
     if (!base::IsStateFolder(home) && std::filesystem::exists(home, error) && !HoldsEmptyFoldersOnly(home) && !error) {
@@ -132,7 +132,7 @@ void FollowStateFolder(store::Store& store, const base::Installation& installati
                 admin::SetMount(store, {}, mount.id, {}, {.path = moved.string(), .own_host = own_host});
             }
         } catch (const std::exception& error) {  // its path can still be set by hand
-            base::LogWarning(Concat("mount ", mount.id, " is not where it was: ", error.what()));
+            base::LogWarning(Concat("cannot find where mount ", mount.id, " has moved to: ", error.what()));
         }
     }
     base::WriteFileAtomically(known, here);
@@ -151,7 +151,7 @@ void RenewMarkers(store::Store& store) {
     }
 }
 
-// Without which this host's maps go on showing them here.
+// Gives other hosts the pictures of this host's e-maps; until then only this host shows them.
 void SharePictures(store::Store& store, const base::Installation& installation) {
     try {
         emap::Pictures(store, installation.Home()).Share();
@@ -160,16 +160,16 @@ void SharePictures(store::Store& store, const base::Installation& installation) 
     }
 }
 
-// Without room for it the upgrade goes on all the same: cameras wait to be recorded.
+// Where there is no room for the copy the upgrade continues without one: cameras are not recorded meanwhile.
 void CopyOlderStore(const base::Installation& installation) {
     try {
         store::Store::CopyIfOlder(installation.StoreUrl(), installation.Home());
     } catch (const store::StoreError& error) {
-        base::LogError(Concat("an upgrade could not be undone: ", error.what()));
+        base::LogError(Concat("no copy of the store was made, so this upgrade cannot be undone: ", error.what()));
     }
 }
 
-// While the older programs go on recording, who would have to wait for it.
+// Made while the older programs still record, so that they are stopped for a shorter time.
 void CopyAhead(const Console& console) {
     const base::Installation installation = console.Installation();
     const bool copied =

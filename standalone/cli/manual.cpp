@@ -14,7 +14,7 @@ namespace lookhaven::cli {
 
 namespace {
 
-// As text of a page, whatever is in it.
+// The text with roff's special characters escaped.
 std::string Escaped(std::string_view text) {
     std::string escaped = text.starts_with('.') || text.starts_with('\'') ? "\\&" : "";
     for (const char each : text) {
@@ -36,7 +36,7 @@ std::vector<const CLI::App*> CommandsOf(const CLI::App& app) {
     return app.get_subcommands([](const CLI::App* each) { return !each->get_group().empty(); });
 }
 
-// Those of the command itself: all have --help.
+// The command's own options, without --help, which every command has.
 std::vector<const CLI::Option*> OptionsOf(const CLI::App& command) {
     return command.get_options(
         [](const CLI::Option* option) { return !option->get_group().empty() && !option->check_name("--help"); });

@@ -9,7 +9,7 @@
 
 namespace lookhaven::cli {
 
-// "lookhaven __manual <folder>", as the first word: for whoever makes a package.
+// "lookhaven __manual <folder>" writes the manual pages; used when a package is built.
 constexpr const char* kManualWord = "__manual";
 
 // Writes lookhaven-<command>.1 for each command of the program into the folder. Throws std::system_error.

@@ -103,7 +103,7 @@ void Change(const Console& console, const Request& request) {
     }
 }
 
-// Nothing when the disk is not there, fails or does not say.
+// Nothing when the disk is not mounted, fails or does not report it.
 std::optional<std::int64_t> FreeBytes(store::Store& store, const Mount& mount) {
     try {
         const auto folder = maintenance::OpenMount(store, mount);

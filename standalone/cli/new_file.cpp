@@ -81,8 +81,9 @@ class SignalsWait {
     sigset_t before_{};
 };
 
-// A file without its name, and a process that gives it the name or removes it, with the rights of whoever made it; it
-// outlives this one, however that ends. The folder is opened once: another one that is put in its place gets nothing.
+// A file under a temporary name, and a process that renames or removes it at the end, with the rights of the user who
+// made it. That process outlives this one, however this one ends. The folder is opened once: another one that is put
+// in its place gets nothing.
 class UnfinishedFile {
   public:
     explicit UnfinishedFile(const std::string& file)

@@ -44,7 +44,7 @@ class StreamCountersWriter {
     // Puts an empty table in place of an earlier recorder's. Throws std::system_error.
     explicit StreamCountersWriter(const base::Installation& installation);
 
-    // In place of what was written before; those beyond 1024 streams are left out.
+    // Replaces what was written before; streams beyond the 1024th are left out.
     void Write(const std::vector<StreamCounters>& streams);
 
   private:

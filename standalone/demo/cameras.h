@@ -25,7 +25,7 @@ struct CamerasAdded {
 // that exist keep their record and plan. In a store without cameras and events the default mount's limit is lowered.
 CamerasAdded AddCameras(store::Store& store);
 
-// Those that still have the demo's name and source.
+// The cameras that still have the demo's name and source.
 std::vector<store::Camera> FindCameras(store::Store& store);
 
 // Removes the demo's group unless it has got other cameras.

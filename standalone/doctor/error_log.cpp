@@ -143,7 +143,7 @@ std::optional<LogFile> OpenLog(const std::filesystem::path& path) {
     return log;
 }
 
-// Without the line that the beginning cuts.
+// The end of the file, from the first whole line on.
 std::string ReadEnd(const LogFile& log) {
     const std::int64_t begin = std::max<std::int64_t>(0, log.size_bytes - std::int64_t{kMaxFileBytes});
     std::string end(static_cast<std::size_t>(log.size_bytes - begin), '\0');

@@ -39,9 +39,9 @@ void AddVersions(const std::vector<store::Host>& hosts, const store::Host& own, 
 }
 
 void AddStandbys(const store::Replication& replication, Findings& findings) {
-    if (const int lost = replication.told - replication.streaming; lost > 0) {
+    if (const int lost = replication.visible - replication.streaming; lost > 0) {
         findings.push_back(
-            {base::Concat(lost, " of ", replication.standbys, " standbys of the database server do not follow it yet"),
+            {base::Concat(lost, " of ", replication.standbys, " standbys of the database server do not stream from it"),
              "look at pg_stat_replication, and at the log of the standby", Severity::kNote});
     }
 }
@@ -58,7 +58,7 @@ Findings CheckHosts(const base::Installation& installation) {
             AddOffline(installation, hosts, findings);
             AddVersions(hosts, *own, findings);
         } else if (!hosts.empty()) {
-            findings.push_back({"this machine is none of the hosts that share its store, so it records nothing",
+            findings.push_back({"this machine is not one of the hosts that share its store, so it records nothing",
                                 "stop the server, run lookhaven host add, and start the server"});
         }
         if (const auto replication = store::ReadReplication(store)) {

@@ -173,11 +173,11 @@ Findings CheckMaintenance(const base::Installation& installation) {
                 findings.push_back(
                     {Concat("the disk of mount ", status.mount, " at ", status.reason,
                             " is full and gets no space back from deleted recordings, so hardly any are deleted now"),
-                     "remove the snapshots or copies that still hold them; recording then goes on by itself"});
+                     "remove the snapshots or copies that still hold them; recording then resumes by itself"});
             }
             if (status.state == maintenance::MountState::kFailing) {
                 findings.push_back({Concat("the recorder's work on mount ", status.mount, " fails: ", status.reason),
-                                    "check that disk; the work goes on by itself"});
+                                    "check that disk; the work then resumes by itself"});
             }
         }
     }

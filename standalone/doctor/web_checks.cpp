@@ -46,7 +46,7 @@ base::FileDescriptor Connect(const WebListener& listener) {
     return is_connected ? std::move(socket) : base::FileDescriptor();
 }
 
-// Of a TLS port, only that somebody listens.
+// Whether the web server answers; on a TLS port, only whether it accepts connections.
 bool Answers(const WebListener& listener) {
     constexpr std::string_view kRequest = "GET / HTTP/1.0\r\nHost: localhost\r\n\r\n";
     const base::FileDescriptor socket = Connect(listener);

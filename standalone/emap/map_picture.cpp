@@ -97,7 +97,7 @@ void RunReencode(std::string_view type, std::string_view file, const std::functi
     }
 }
 
-// Until the end, the deadline, or one byte more than the largest outcome has.
+// Reads until the end, the deadline, or one byte more than the largest outcome has.
 std::string ReadOutcome(int input) {
     const Clock::time_point deadline = Clock::now() + kMaxTime;
     std::string outcome;

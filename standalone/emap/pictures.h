@@ -38,19 +38,20 @@ class Pictures {
     std::string Write(std::string_view bytes);
     // Removes what Write has just written unless a map has it by now.
     void Withdraw(const std::string& name);
-    // Before a map loses its picture: Sweep spares it for a minute, for who has read the map's row just now.
+    // Call before a map loses its picture: Sweep spares it for a minute, for processes that have just read the map's
+    // row.
     void Touch(const std::string& name);
 
     // Removes files that no map names, a minute after they were written or touched, and what the store has of them ten
     // minutes after, since the clocks of hosts differ.
     void Sweep();
 
-    // Puts what the store lacks of this host's files into it, where several hosts may share it: from before it was one
-    // of theirs.
+    // Puts those of this host's files that the store lacks into it, where several hosts may share it: pictures from
+    // before this host was one of them.
     void Share();
 
-    // The file's bytes, or the store's. Throws std::system_error when neither is there, also for a name that is none of
-    // ours.
+    // The file's bytes, or the store's. Throws std::system_error when neither is there, also for a name that is not
+    // one of ours.
     std::string Read(const std::string& name) const;
 
   private:

@@ -45,7 +45,7 @@ Json::Value SpansJson(const Plan& plan, const std::vector<archive::TimeSpan>& sp
     return json;
 }
 
-// Without what fills it up.
+// The manifest's text, before it is padded to its size.
 std::string TextOf(const Plan& plan, std::span<const WrittenFile> written) {
     Json::Value json;
     json["format"] = kManifestFormat;

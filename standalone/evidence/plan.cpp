@@ -58,7 +58,7 @@ struct Part {
 std::vector<Part> PartsOf(const CameraFootage& camera, const TimeSpan& span, const media::RemuxLibrary& remux) {
     std::vector<Part> parts;
     for (const std::filesystem::path& recording : camera.recordings) {
-        // Of archive::ArchiveError, media::SourceError and std::system_error, each says which recording it is.
+        // archive::ArchiveError, media::SourceError and std::system_error all name the recording.
         try {
             if (!std::filesystem::exists(recording)) {
                 continue;  // deleted meanwhile

@@ -2,7 +2,7 @@
 //
 // What an export of a span will hold, known to the byte before the first one is sent.
 //
-// Why so        Whoever downloads must see whether the copy is whole, and how long it will take. So sizes, times and
+// Why so        A user must see whether the download is complete, and how long it will take. So sizes, times and
 //               gaps come from the frame indexes, and each file is filled up to its size; only the hashes come later.
 #pragma once
 

@@ -22,7 +22,7 @@ ScgiParser::State ScgiParser::Feed(std::string_view bytes) {
         }
     }
     if (state_ == State::kComplete && !bytes.empty()) {
-        Fail("the request goes on behind its body");
+        Fail("there are bytes after the request's body");
     }
     if (state_ == State::kIncomplete && place_ == Place::kBody && body_bytes_ > kMaxAwaitedBodyBytes) {
         request_.unread_body_bytes = body_bytes_ - request_.body.size();

@@ -3,7 +3,7 @@
 // Parses one SCGI request as its bytes arrive.
 //
 // Format        <decimal length>:<name> NUL <value> NUL … ,<body>. The first name is CONTENT_LENGTH, and SCGI is "1".
-//               A large body is not waited for: who may send one, the request's process finds out before it reads it.
+//               A large body is not waited for: the request's process checks the sender's rights before it reads it.
 // Invariants    (1) Never keeps more than the head, a small body and one chunk, whatever a client sends.
 //               (2) Complete and malformed are final.
 #pragma once

@@ -9,7 +9,7 @@ namespace lookhaven::host {
 
 namespace {
 
-// Whoever started this process may have it ignore signals.
+// The parent process may have this one ignore signals.
 void StopIgnoringSignals() {
     for (int number = 1; number < NSIG; ++number) {
         struct sigaction inherited {};

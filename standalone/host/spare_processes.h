@@ -31,7 +31,7 @@ class SpareProcesses {
         std::function<int(int channel)> leave_host;
         // Before it waits: what every request needs, once. May take long, or throw, which ends the process.
         std::function<void()> prepare;
-        // With the connection as standard output.
+        // Answers a request; the connection is standard output.
         std::function<void(http::Request&, control::Slot&)> serve;
     };
 

@@ -19,7 +19,7 @@ class RequestCounters {
   public:
     // Upper bounds of the histogram's buckets, in seconds; the last one has none.
     static constexpr std::array kBounds{0.001, 0.0025, 0.005, 0.01, 0.025, 0.05, 0.1, 0.25, 0.5, 1.0, 2.5, 5.0, 10.0};
-    // So many different calls are told apart.
+    // How many different calls are counted separately.
     static constexpr std::size_t kMaxCalls = 256;
 
     struct Durations {
@@ -34,7 +34,7 @@ class RequestCounters {
     // call: "VEXO.Event/List", or empty for what named none. It comes from a process that may have been taken over:
     // beyond kMaxCalls names, and for what is no status, nothing new is told apart.
     void NoteServed(std::string_view call, int status, bool is_stream, std::chrono::microseconds took);
-    // Without a process.
+    // Counts a request that the host refused without a process.
     void NoteRefused(int status) { ++refused_[status]; }
 
     const std::map<std::string, Call, std::less<>>& Calls() const { return calls_; }

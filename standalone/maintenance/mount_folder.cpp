@@ -27,11 +27,11 @@ namespace {
 constexpr std::size_t kMaxMarkerBytes = 128;
 constexpr std::string_view kMarkerBegin = "lookhaven mount ";
 constexpr std::string_view kMarkerOwner = " of ";
-// Above this a folder's name is a number of somebody else's.
+// A folder with a higher number as its name is not ours.
 constexpr int kMaxCamera = 1'000'000;
 constexpr const char* kLogName = "seconds";
 constexpr const char* kProbeName = ".lookhaven-probe";
-// Of a file system that does not say.
+// Assumed for a file system that does not report its free space.
 constexpr std::int64_t kAssumedFreeBytes = std::int64_t{1} << 50;
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW;
 

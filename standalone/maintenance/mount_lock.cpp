@@ -29,8 +29,8 @@ bool MountLock::Hold(const std::filesystem::path& folder) {
     if (marker_ && IsSameFile(marker_.Get(), marker.Get())) {
         return true;
     }
-    // Whoever can read the marker can lock it, too. Of another owner's file, and on a file system without modes, it
-    // stays so.
+    // Any process that can read the marker can lock it, so only its owner may. Fails, harmlessly, for a file of another
+    // owner and on a file system without modes.
     ::fchmod(marker.Get(), 0600);
     if (::flock(marker.Get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK) {
         return false;

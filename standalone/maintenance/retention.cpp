@@ -16,7 +16,7 @@ namespace {
 
 constexpr int kEventsPerBatch = 100;
 constexpr std::int64_t kFilesOfEvent = 2;  // with its index
-// So many events with dates in the future are looked past.
+// How many events with dates in the future are skipped at most.
 constexpr std::size_t kMaxMisdated = 10'000;
 
 // By the age limit. Both walks below go in the order of recording and stop at the first event that is not, so the limit
@@ -109,7 +109,7 @@ class Retention {
         return mount_.max_bytes > 0 ? events_.Content(mount_.id).size_bytes - mount_.max_bytes : 0;
     }
 
-    // Of what the disk should have free.
+    // How much must be deleted until the disk has its reserve free again.
     static std::int64_t LackingBytes(const MountSpace& space) {
         return space.free_bytes < 2 * space.ReserveBytes() ? 3 * space.ReserveBytes() - space.free_bytes : 0;
     }

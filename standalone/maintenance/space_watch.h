@@ -3,7 +3,7 @@
 // Tells whether deleting recordings gives a disk its space back.
 //
 // Why so        What a snapshot or a copy that shares its blocks holds (btrfs, ZFS, XFS) stays in use when the file is
-//               gone. Whoever deletes until the disk has room would then delete everything and gain nothing.
+//               gone. Deleting until the disk has room would then delete everything and gain nothing.
 // Invariants    While space does not come back, no more is deleted for lack of it than was needed once, and a little at
 //               each attempt after that. What else there is to delete, for age or a limit, is not this class's matter.
 // Thread safety One thread.
@@ -13,8 +13,8 @@
 
 namespace lookhaven::maintenance {
 
-// Of one resource, bytes or files. Its room is what is free and what recordings hold, together: recording and deleting
-// leave it as it is, until deleted files go on holding what they held.
+// Watches one resource, bytes or files. Its room is the sum of what is free and what recordings hold, which recording
+// and deleting do not change, unless deleted files keep their space.
 class SpaceWatch {
   public:
     // Some file systems need half a minute to free what was deleted.

@@ -16,7 +16,7 @@ namespace {
 
 template <class Library>
 const Library& Load(const char* name, const char* function) {
-    // Of the functions of a hundred libraries few are ever called.
+    // Lazily bound: only a few of the functions of a hundred libraries are ever called.
     void* handle = ::dlopen(name, RTLD_LAZY | RTLD_LOCAL);
     auto* get = handle == nullptr ? nullptr : ::dlsym(handle, function);
     if (get == nullptr) {

@@ -29,8 +29,8 @@ struct RecordedPacket {
     std::span<const std::uint8_t> data;
     std::int64_t time_ms = 0;      // from the start of the recording or span; negative before a span
     std::int64_t captured_ms = 0;  // wall clock
-    // The video frame's number, as RecordingReader counts: of a repeated frame the first, or the one that reading began
-    // with. Nothing for a frame outside the span that is only needed for decoding others.
+    // The video frame's number, as RecordingReader counts: for a repeated frame the first, or the one that reading
+    // began with. Nothing for a frame outside the span that is only needed for decoding others.
     std::optional<int> number;
 };
 

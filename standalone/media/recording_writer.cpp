@@ -38,7 +38,7 @@ archive::IndexHeader HeaderOf(const MediaFormat& format, std::int64_t start_wall
             reason};
 }
 
-// While the disk is away its paths lead elsewhere, where nothing of it is.
+// Whether the file was deleted. While its disk is not mounted, the path leads to another file system.
 bool IsGone(const std::filesystem::path& path, dev_t device) {
     struct stat status {};
     return ::stat(path.c_str(), &status) != 0 && errno == ENOENT && ::stat(path.parent_path().c_str(), &status) == 0 &&

@@ -24,7 +24,7 @@ constexpr int kMaxWaitSeconds = 2;
 // Events that begin for a camera's times alone: so many in a row, and then one in each interval.
 constexpr std::int64_t kMaxCutBurst = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;
-constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // of pictures; more is a camera that was away
+constexpr std::int64_t kMaxIntervalUs = 30'000'000;  // between pictures; a longer gap means that the camera was lost
 // Events that the disk did not let finish are tried again for so long. Their files are open meanwhile, so that a disk
 // that stays broken could not be unmounted.
 constexpr std::int64_t kFinishTimeoutUs = 60'000'000;
@@ -99,7 +99,7 @@ void CameraRecorder::Tick() {
     }
 }
 
-// A disk that was full, away or read-only for a moment must not leave files that look as if a crash had.
+// A disk that was full, unmounted or read-only for a moment must not leave files that look as if a crash had.
 void CameraRecorder::FinishPending() {
     const std::int64_t now_us = context_.monotonic_us();
     if (unfinished_.empty() || now_us < finish_again_us_) {

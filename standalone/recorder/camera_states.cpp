@@ -14,7 +14,7 @@ CameraStates::CameraStates(const base::Installation& installation) {
             }
         }
     } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot read how the recorder before left cameras: ") + failure.what());
+        base::LogWarning(std::string("cannot read what the previous recorder reported of cameras: ") + failure.what());
     }
 }
 

@@ -24,7 +24,7 @@ constexpr std::int64_t kMaxDelayS = 3;
 EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder, int host, LeaseTimes times)
     : stored_us_(base::MonotonicMicros()),
       lease_(recorder, base::MonotonicMicros, host, times),
-      thread_(store_url, "store the events, recording goes on",
+      thread_(store_url, "store the events, recording continues",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
 std::optional<int> EventRowQueue::TakeId() {

@@ -47,7 +47,7 @@ bool LeaseKeeper::IsRefused(store::Store& store) {
     if (host_ != 0 && !hosts.Find(host_)) {
         refusal = "this machine is no host of this store any more: add it with lookhaven host add";
     } else if (host_ == 0 && !hosts.All().empty()) {
-        refusal = "hosts share this store, and this machine is none of them: add it with lookhaven host add";
+        refusal = "hosts share this store, and this machine is not one of them: add it with lookhaven host add";
     }
     if (std::exchange(told_refusal_, refusal) != refusal && !refusal.empty()) {
         base::LogError("does not record: " + refusal);

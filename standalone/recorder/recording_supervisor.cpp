@@ -57,7 +57,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
             }
         }
     } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot read how the recorder before left mounts: ") + failure.what());
+        base::LogWarning(std::string("cannot read what the previous recorder reported of mounts: ") + failure.what());
     }
 }
 
@@ -105,7 +105,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         }
         const auto entry = entries_.find(camera);
         if (entry == entries_.end() || entry->second.is_ending) {
-            continue;  // started again once it can be, or has ended
+            continue;  // it is tried again, or started again once it has ended
         }
         entry->second.stream = {camera, plan.stream};
         RecordingRequest request{plan, marked.contains(camera) ? marked.at(camera) : 0};
@@ -249,7 +249,7 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
     are_mounts_recovered_ = are_recovered;
 }
 
-// No row will come, neither from this recorder nor of what an earlier one left on a mount.
+// Whether no more rows will come, neither from this recorder nor from files that an earlier one left on a mount.
 bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
     if (rows_.IsRefused() || !rows_.FirstReservedId()) {
         return false;  // another recorder has the footage
@@ -272,7 +272,8 @@ bool RecordingSupervisor::HasRoom() const {
     });
 }
 
-// A thread that cannot be had costs that camera or mount alone, until it can. Logged once for each reason.
+// A thread that cannot be started affects that camera or mount alone, and is tried again. Logged once for each
+// reason.
 template <class Work>
 void RecordingSupervisor::Start(const std::string& what, Work&& start) {
     try {

@@ -12,8 +12,8 @@
 
 namespace lookhaven::remote {
 
-// Of an array of {"id", "name", "video", "audio"}; server_id is 0. Throws Json::Exception for a member of the wrong
-// type.
+// Reads an array of {"id", "name", "video", "audio"}; server_id is 0. Throws Json::Exception for a member of the
+// wrong type.
 std::vector<store::RemoteCamera> CamerasIn(const Json::Value& list);
 
 // The data of what a host's VEXO.Pairing answers, whose member "camera" is such a list. Throws NoAnswer for any other

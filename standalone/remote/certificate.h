@@ -23,7 +23,7 @@ std::string CertificatesIn(const std::string& pem);
 // InvalidCertificate when that is no valid host name.
 std::string CertificateName(const std::string& pem);
 
-// Of the first certificate.
+// Facts about the first certificate.
 struct CertificateFacts {
     std::string subject;      // "CN=nvr", as RFC 4514 writes it
     std::string fingerprint;  // SHA-256 of its DER form, as browsers show it: "AB:0C:…"

@@ -107,7 +107,7 @@ bool IsFactor(const EVP_PKEY* key, const char* name) {
     return is_one;
 }
 
-// Else whoever made it up decides how long it is examined for primes.
+// The size of the factors decides how long testing them for primality takes: it must not be an attacker's choice.
 bool HasUsableFactors(const EVP_PKEY* key) {
     BIGNUM* third = nullptr;
     const bool has_third = EVP_PKEY_get_bn_param(key, OSSL_PKEY_PARAM_RSA_FACTOR3, &third) == 1;
@@ -137,7 +137,7 @@ Key ReadKey(const std::string& pem) {
     throw InvalidCertificate("there is no private key in PEM format, or it is damaged");
 }
 
-// With the kind first: what is asked of the key then takes a bounded time.
+// Checks the kind first, so that the checks after it take a bounded time.
 void RequireKeyOf(X509* certificate, EVP_PKEY* key) {
     if (!IsUsableKind(X509_get0_pubkey(certificate)) || !IsUsableKind(key)) {
         throw InvalidCertificate(

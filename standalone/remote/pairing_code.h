@@ -3,8 +3,8 @@
 // The code by which two hosts are paired: shown on the one that has the cameras, and typed on the one that is to show
 // them.
 //
-// Why so        Whoever types it reaches the other host by an address alone, and must neither send the secret to
-//               somebody in between nor take cameras from there: so the code names the certificate, too.
+// Why so        The user who types it knows only the other host's address, and must neither send the secret to a man
+//               in the middle nor take cameras from one: so the code names the certificate, too.
 // Format        160 bits in eight groups of four digits, base 32 without I, L, O and U: the first 80 bits of the
 //               certificate's SHA-256, a secret of 64 bits, and a CRC-16 of both. The CRC finds every change within
 //               three neighbouring digits: a wrong one, and two that were swapped.

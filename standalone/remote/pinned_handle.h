@@ -32,7 +32,7 @@ class PinnedHandle {
     }
     CURLcode Perform() { return ::curl_easy_perform(handle_.get()); }
 
-    // Of the answer, as far as it has come.
+    // What is known of the answer so far.
     long Status() const;
     std::string ContentType() const;
     std::int64_t SizeBytes() const;  // of its body; -1 when it is not known

@@ -22,8 +22,8 @@
 // Crash rule    Every step leaves the segment valid. A segment without magic is unfinished, and nobody's once its
 //               creator is dead. A writer that dies between two steps leaves at worst an entry that the index does not
 //               name; the next writer removes every entry from the index and begins behind the highest count. A reader
-//               that dies leaves a slot whose owner is dead; whoever needs it frees it. An owner is one word of process
-//               id and start time, so owning and releasing is one store.
+//               that dies leaves a slot whose owner is dead; the process that needs it frees it. An owner is one word
+//               of process id and start time, so owning and releasing is one store.
 #pragma once
 
 #include <atomic>

@@ -37,7 +37,7 @@ class AuditLog {
 
     // Stores the entry under a new id, which it returns; entry.id is ignored.
     int Add(AuditEntry entry);
-    // Those before that entry, newest first; before_id 0: from the newest on.
+    // The entries before that one, newest first; before_id 0: from the newest on.
     std::vector<AuditEntry> List(int before_id, int limit);
 
   private:

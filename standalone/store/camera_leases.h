@@ -33,7 +33,7 @@ class CameraLeases {
     // The store must outlive this object.
     explicit CameraLeases(Store& store) : connection_(store.connection()) {}
 
-    // Of all cameras, by id, also of those that nobody ever had.
+    // The leases of all cameras, by camera id, including those that no host ever held.
     std::vector<CameraLease> List();
     // Gives the host the lease if it is still as it was seen; silent_heartbeat: that of the holder, if there is one.
     // False when somebody was faster, or the holder is not silent.

@@ -23,8 +23,8 @@ constexpr const char* kBriefTimeoutMs = "20";
 
 constexpr std::size_t kMaxNameBytes = 64;
 
-// A server that is away or hangs must not hold up the recorder or a request for minutes. What the address itself says
-// about connecting goes first.
+// A server that is unreachable or hangs must not hold up the recorder or a request for minutes. What the address
+// itself says about connecting goes first.
 std::string WithTimeouts(std::string location) {
     const bool is_url = location.starts_with("postgresql://");
     for (const std::string limit : {"connect_timeout=2", "tcp_user_timeout=5000"}) {

@@ -73,7 +73,7 @@ class Devices {
     std::optional<Device> FindOnServer(EmapItemType kind, int server_id, int id_on_server);
     std::vector<Device> List(EmapItemType kind);  // by id
 
-    // Of a camera of this host or of a paired one. Throws NotFound or InvalidRecord.
+    // For a camera of this host or of a paired one. Throws NotFound or InvalidRecord.
     void SetCameraPorts(int camera_id, PortCounts counts);
     std::map<int, PortCounts> CameraPorts();  // by camera, only those that have any
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The pictures of e-maps in a store that several hosts may share, where each of them finds those that another was
-// given. Everywhere else they are files alone (emap/pictures.h), and this has none of them.
+// given. In other stores they are only files (emap/pictures.h), and this is empty.
 #pragma once
 
 #include <cstdint>
@@ -24,14 +24,14 @@ class EmapPictures {
     void Put(const std::string& name, std::string_view bytes, std::int64_t now_s);
     // Nothing where there is none of that name, or it is damaged.
     std::optional<std::string> Find(const std::string& name);
-    // RemoveUnused counts from then on.
+    // Notes that the picture is in use now, for RemoveUnused.
     void Touch(const std::string& name, std::int64_t now_s);
-    // Unless a map has it.
+    // Removes the picture unless a map has it.
     void Withdraw(const std::string& name);
-    // Those that no map has, and that were neither put nor touched from that second on.
+    // Removes those that no map has, and that were neither put nor touched from that second on.
     void RemoveUnused(std::int64_t before_s);
 
-    // Of the maps whose picture is not here.
+    // The names of pictures that maps have and this store lacks.
     std::vector<std::string> Missing();
 
   private:

@@ -16,7 +16,7 @@ namespace {
 
 constexpr int kRowsPerBatch = 10'000;
 
-// As PostgreSQL writes an array.
+// An array in PostgreSQL's text form.
 std::string ArrayText(const std::set<int>& ids) {
     std::string text = "{";
     for (const int id : ids) {
@@ -233,7 +233,7 @@ std::vector<RecentFootage> Events::RecordedSince(std::int64_t from_s) {
     return footage;
 }
 
-// By halves: later events have higher orders, and the index knows no dates.
+// A binary search: later events have higher orders, and the index has no dates.
 std::int64_t Events::OrderSince(int mount_id, std::int64_t start_s, std::int64_t low, std::int64_t high) {
     while (low < high) {
         const std::int64_t middle = low + (high - low) / 2;

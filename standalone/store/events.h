@@ -163,7 +163,7 @@ class Events {
     // Finished events of the mount that are neither kept nor demo, in the order in which they were recorded: those
     // after that event, from the first on after Event().
     std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
-    // Of the event's row that is pending deletion; nothing when there is none.
+    // The file's path of an event whose row is pending deletion; nothing when there is no such row.
     std::optional<std::string> PathPendingDeletion(int id);
     // Gives the mount's rows of a recorder of an earlier version, which has no order of recording, that of their ids.
     void SetMissingOrders(int mount_id);

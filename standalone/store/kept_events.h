@@ -29,9 +29,9 @@ class KeptEvents {
     // The store must outlive this object.
     explicit KeptEvents(Store& store) : connection_(store.connection()) {}
 
-    // Of those of the events that exist, growing ones too; one that is kept already gets the new note and keeper. Each
-    // is one transaction and returns how many there were: an event that retention is deleting is not among them. Keep
-    // throws InvalidRecord.
+    // Keeps or releases those of the events that exist, growing ones too, in one transaction. Returns how many there
+    // were: an event that retention is deleting does not count. An event that is kept already gets the new note and
+    // keeper. Keep throws InvalidRecord.
     int Keep(std::span<const int> event_ids, const KeepRecord& record);
     int Release(std::span<const int> event_ids);
 

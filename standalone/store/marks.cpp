@@ -44,8 +44,8 @@ void RequireMark(const Mark& mark) {
     }
 }
 
-// Older ones that still wait count too: those of a mount that is away would grow without end. The command line reports
-// as much as it likes.
+// Older ones that still wait count too: those of a mount whose disk is missing would grow without end. The command line
+// reports as much as it likes.
 void RequireWithin(soci::session& sql, std::int64_t max_per_day, const Reporter& reporter, std::int64_t now_s) {
     const std::int64_t since_s = now_s - kSecondsPerDay;
     const auto reported = FetchOne<std::int64_t>(

@@ -153,7 +153,7 @@ void Mounts::Remove(int id, bool forget_events) {
 }
 
 void Mounts::ReserveIds(int camera, int event) {
-    // Else one file name could leave no ids for this installation's own events.
+    // Otherwise one file name could leave no ids for this installation's own events.
     event = event > kMaxReservedEvent ? 0 : event;
     connection_.Write([&](soci::session& sql) {
         for (const auto& [counter, id] : {std::pair("camera", camera), std::pair("event", event)}) {

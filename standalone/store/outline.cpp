@@ -64,7 +64,7 @@ void JoinedBars::Add(const Bar& bar) {
 Outline OutlineOf(Store& store, int camera_id, std::int64_t begin_s, std::int64_t end_s, std::int64_t step_s) {
     Outline outline;
     store.connection().Read([&](soci::session& sql) {
-        outline = {};  // it may be read once more
+        outline = {};  // the read may be repeated
         AddBars(sql, camera_id, begin_s, end_s, step_s, outline);
         AddMarks(sql, camera_id, begin_s, end_s, step_s, outline);
     });

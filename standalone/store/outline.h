@@ -21,7 +21,7 @@ struct Bar {
     friend bool operator==(const Bar&, const Bar&) = default;
 };
 
-// Bars of events, which come by their start.
+// Joins the bars of events, which are added in the order of their starts.
 class JoinedBars {
   public:
     // step_s: at least 1.
@@ -35,7 +35,7 @@ class JoinedBars {
 
     std::int64_t step_s_;
     std::vector<Bar> bars_;
-    bool is_joined_ = false;  // the last one consists of short ones
+    bool is_joined_ = false;  // the last bar was joined from short ones
 };
 
 struct Outline {
@@ -47,8 +47,8 @@ struct Outline {
     bool IsEmpty() const { return continuous.empty() && alarm.empty() && alerts.empty() && transactions.empty(); }
 };
 
-// Of the events and marks that touch the span from begin_s up to, not including, end_s. step_s: at least 1. Reads each
-// of them once, in the order of an index: a tenth of a second for a hundred thousand.
+// The outline of the events and marks that touch the span from begin_s up to, not including, end_s. step_s: at least
+// 1. Reads each of them once, in the order of an index: a tenth of a second for a hundred thousand.
 Outline OutlineOf(Store& store, int camera_id, std::int64_t begin_s, std::int64_t end_s, std::int64_t step_s);
 
 }  // namespace lookhaven::store

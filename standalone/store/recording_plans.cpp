@@ -56,7 +56,7 @@ HourMode ModeOfHour(RecordMode mode, const std::string& hours, int hour_of_week)
         return HourMode::kAroundMarks;
     }
     const auto hour = static_cast<std::size_t>(hour_of_week);
-    // Of a damaged row rather too much is recorded than nothing.
+    // With a damaged row it is better to record too much than nothing.
     return hour < hours.size() ? static_cast<HourMode>(hours[hour]) : HourMode::kAlways;
 }
 

@@ -8,7 +8,7 @@ namespace lookhaven::store {
 template <>
 struct Mapping<Replication> {
     static auto Members(auto& replication) {
-        return std::tie(replication.is_standby, replication.standbys, replication.told, replication.streaming,
+        return std::tie(replication.is_standby, replication.standbys, replication.visible, replication.streaming,
                         replication.lag_bytes);
     }
 };
@@ -17,7 +17,7 @@ std::optional<Replication> ReadReplication(Store& store) {
     if (store.IsSqlite()) {
         return std::nullopt;
     }
-    // A server that is a standby itself has no place of its own in the log.
+    // A standby has no write position of its own in the log.
     return store.connection().FetchOne<Replication>(
         "select cast(pg_is_in_recovery() as integer), cast(count(*) as integer), cast(count(state) as integer),"
         " cast(count(*) filter (where state = 'streaming') as integer),"

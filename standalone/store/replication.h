@@ -11,11 +11,11 @@
 namespace lookhaven::store {
 
 struct Replication {
-    bool is_standby = false;     // of the server that answers
+    bool is_standby = false;     // the server that answers is one itself
     int standbys = 0;            // that are connected to it
-    int told = 0;                // of these, those whose state this account may see
-    int streaming = 0;           // of these, those that follow
-    std::int64_t lag_bytes = 0;  // by which the last of these is behind
+    int visible = 0;             // of these, those whose state this account may see
+    int streaming = 0;           // of the visible ones, those that stream from it
+    std::int64_t lag_bytes = 0;  // by which the slowest streaming one is behind
 };
 
 // Nothing for SQLite.

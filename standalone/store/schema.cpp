@@ -103,7 +103,7 @@ constexpr const char* kEmaps[] = {
     "create table device_states (kind integer not null, device_id integer not null, port integer not null,"
     " state text not null, since_s bigint not null, primary key (kind, device_id, port),"
     " foreign key (kind, device_id) references devices (kind, id) on delete cascade)",
-    // Of this host's cameras and of paired hosts'.
+    // The ports of this host's cameras and of paired hosts' cameras.
     "create table camera_ports (camera_id integer not null primary key, inputs integer not null,"
     " outputs integer not null)",
 

@@ -14,8 +14,8 @@ namespace lookhaven::store {
 
 namespace {
 
-// Of a password that nobody knows. A literal, since computing one at the first unknown name would take twice as long as
-// verifying a known one, and so tell them apart.
+// The hash of a password that nobody knows. A literal, since computing one at the first unknown name would take twice
+// as long as verifying a known one, and so tell them apart.
 constexpr const char* kDummyHash =
     "$argon2id$v=19$m=65536,t=2,p=1$hV8m1iLSluiSrYIMrSKeag$DXWqEsUIys7oW/dbZ40036DcKkJgYYcDjGgiiJ9xt5g";
 

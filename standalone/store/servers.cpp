@@ -122,7 +122,7 @@ int AddRow(soci::session& sql, RecordingServer server, const std::string& secret
     return server.id;
 }
 
-// With the id of the one that it renews; 0 where there is none.
+// The host with the id of the record that it replaces; 0 where there is none.
 RecordingServer Matched(soci::session& sql, RecordingServer server) {
     const auto known = FetchOne<RecordingServer>(sql, "where name = :name", server.name);
     server.id = known && known->address.empty() == server.address.empty() ? known->id : 0;

@@ -78,10 +78,10 @@ class RecordingServers {
 
     // Empty for an unknown or disabled host.
     std::string FindSecret(int id);
-    // Of the enabled hosts without an address: hosts that connect to this one. The secret of a host that this host
-    // connects to admits nobody here.
+    // The secrets of the enabled hosts without an address, which connect to this one. The secret of a host that this
+    // host connects to admits nobody here.
     std::vector<std::string> InboundPeerSecrets();
-    // Of all enabled hosts, whichever side connects.
+    // The pairings of all enabled hosts, whichever side connects.
     std::set<std::uint64_t> Pairings();
 
     // Gives the host's camera an id on this host, or updates the record of one that has it; camera.id is ignored.

@@ -134,7 +134,7 @@ class PartialCopy {
     }
 };
 
-// Of a copy made ahead: it lacks what was stored since.
+// Whether a copy made ahead is new enough; it lacks what was stored since.
 bool IsRecent(const std::filesystem::path& copy) {
     std::error_code none;
     const auto made = std::filesystem::last_write_time(copy, none);
@@ -226,7 +226,7 @@ int Store::Migrate(const std::string& url) {
     return connection.Write([&](soci::session& sql) {
         if (!connection.IsSqlite()) {
             Execute(sql, "set local statement_timeout = 0");  // a step may rewrite a million rows …
-            Execute(sql, "set local lock_timeout = '5s'");    // … but whoever waits for it holds up the others
+            Execute(sql, "set local lock_timeout = '5s'");    // … but one that waits for a lock blocks all others
         }
         LockSchema(connection, sql);
         const int version = ReadVersion(connection);

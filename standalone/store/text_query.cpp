@@ -20,7 +20,7 @@ constexpr std::size_t kMaxTypedBytes = 500;
 constexpr std::size_t kMaxWords = 16;
 constexpr std::size_t kMaxMarkedLines = 100;  // as lists of many texts can be shown
 
-// Of this locale every system has the letters of all scripts.
+// The locale that every system has, and that knows the letters of all scripts.
 locale_t Unicode() {
     static const locale_t locale = ::newlocale(LC_CTYPE_MASK, "C.UTF-8", nullptr);
     return locale != nullptr ? locale : LC_GLOBAL_LOCALE;

@@ -19,7 +19,7 @@ class TextQuery {
         std::vector<std::string> words;  // in a row, in small letters
     };
 
-    // Of nothing: it has no phrases.
+    // An empty query, without phrases.
     TextQuery() = default;
     // Throws InvalidRecord for a text without words, one that is no UTF-8, and one of more than 16 words or 500 bytes.
     explicit TextQuery(std::string_view typed);

@@ -14,7 +14,7 @@ inline void RequireUser(soci::session& sql, int id) {
             id);
 }
 
-// Of everyone who has logged in with that account.
+// Ends all sessions of that account.
 inline void EndSessions(soci::session& sql, int user_id) {
     Execute(sql, "delete from sessions where user_id = :user", user_id);
 }

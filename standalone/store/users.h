@@ -21,7 +21,7 @@ constexpr int kPairedHostUserId = 1024;
 enum class Privilege : int { kOwner = 0, kManager = 1, kViewer = 2 };
 
 // What a user may be denied at a camera or a group of them; the numbers are stored. Export is of whole recordings as
-// files, which nobody gets who may not play them: a denial of playback is one of export, too.
+// files, and needs the right to play them: a denial of playback is one of export, too.
 enum class CameraAccess : int { kLive = 1, kPlayback = 2, kAudio = 8, kExport = 16 };
 constexpr std::initializer_list<CameraAccess> kEveryAccess = {CameraAccess::kLive, CameraAccess::kPlayback,
                                                               CameraAccess::kAudio, CameraAccess::kExport};
@@ -89,7 +89,7 @@ class Users {
     // Whether there is no account yet. Reads one row at most.
     bool IsEmpty();
 
-    // Inside of InTransaction: until its end, nobody else who calls this goes on.
+    // Call inside InTransaction: until its end, other callers of this wait.
     void Lock();
 
     // These throw NotFound for an unknown id.

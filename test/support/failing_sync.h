@@ -10,8 +10,8 @@
 
 namespace lookhaven::test {
 
-// Of this thread's next calls; each reports that writing failed. Like Linux, which reports a lost write once: the call
-// after them succeeds, whatever became of the data.
+// How many of this thread's next calls report that writing failed. Like Linux, which reports a lost write once: the
+// call after them succeeds, whatever became of the data.
 inline thread_local int g_failing_syncs = 0;
 
 }  // namespace lookhaven::test

@@ -90,7 +90,7 @@ class ApiTest(unittest.TestCase):
             for query in ("", "api=VEXO%2EAuth&version=1&method=Login", "api=VEXO.Event&api=VEXO.Auth&method=Login"):
                 self.assertEqual(server.request(query, form=form).status, 429, query)
             wait_until(lambda: server.request(LOGIN, form=form).status == 401, 5, "a log-in is let through again")
-            # Whoever guesses is who is banned, whatever the account's name says.
+            # The client's address is banned, not the one in the account's name.
             rule = re.search("^failregex = (.*)", (ROOT / "packaging/fail2ban/filter.d/lookhaven.conf").read_text(), re.M)[1]
             pattern = re.compile(rule.replace("<HOST>", "(.*?)"))
             lines = (server.home / "log/refused-log-ins.log").read_text().splitlines()

@@ -18,7 +18,7 @@ VIDEO = b"HTTP/1.1 200 OK\r\nContent-Type: multipart/x-mixed-replace; boundary=e
 
 
 class Camera:
-    """Gives whoever connects the same answer to every request; with `repeated` it goes on with that until they leave."""
+    """Gives each client the same answer to every request; with `repeated` it goes on with that until they leave."""
 
     def __init__(self, answer, tls=None, repeated=b""):
         self.answer, self.tls, self.repeated, self.requests = answer, tls, repeated, 0

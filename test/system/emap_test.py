@@ -99,7 +99,7 @@ class EmapTest(unittest.TestCase):
         picture.write_bytes(b"\x89PNG\r\n\x1a\nand nothing more")
         self.assertEqual((self.shown(made["id"])["emapType"], self.shown(made["id"])["itemNum"]), ("png", 1))
         picture.unlink()
-        os.mkfifo(picture)  # would hang whoever opens it to read
+        os.mkfifo(picture)  # opening it to read would hang
         data = self.shown(made["id"])
         self.assertEqual((data["emap"], data["emapLength"], data["itemNum"]), ("", "0", 1))
 

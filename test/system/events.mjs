@@ -41,7 +41,7 @@ await visit(async (page, complaints) => {
     const [, date, time] = /^\w+ (.*) (\S+)$/.exec(await text(".transport-time"));
     return Date.parse(`${date} ${new Date(start * 1000).getFullYear()} ${time.slice(0, 8)}`) / 1000 + Number(time.slice(8));
   };
-  // Of a day that is not over, the timeline shows hours of the day before as well. So look where the time is, pan it to
+  // On a day that is not over, the timeline also shows hours of the day before. So look where the time is, pan it to
   // the middle, for near an edge the timeline follows what plays, go on towards the seconds, and look again, until it is
   // there: a browser may take a wheel for turned before the page has seen it.
   const x = box.width / 2;

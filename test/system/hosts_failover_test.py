@@ -1,7 +1,7 @@
 # SPDX-License-Identifier: Apache-2.0
 #
-# Three hosts on one store with a standby, made as docs/guide/hosts.md says: one of them is lost, the store is away, its
-# primary is lost, and each time nothing that was recorded is.
+# Three hosts on one store with a standby, made as docs/guide/hosts.md says: one of them is lost, the store is
+# unreachable, its primary is lost, and each time nothing that was recorded is.
 import collections
 import os
 import pathlib

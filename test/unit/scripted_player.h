@@ -72,7 +72,7 @@ struct Player : ScriptedPlatform {
         return capture.Text();
     }
 
-    // Of each call that begins with the text, what follows it up to the next comma or bracket; joined.
+    // What follows the text up to the next comma or bracket, in each call that begins with it; joined.
     std::string All(const std::string& text) const {
         std::string all;
         for (const auto& call : CallsOf(text)) {

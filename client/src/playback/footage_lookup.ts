@@ -20,7 +20,7 @@ export class FootageLookup {
     this.#cache = cache;
   }
 
-  /** As far as is known; null where nothing is. */
+  /** What is known so far; null for nothing. */
   at(camera: number, atMs: number): Footage | null {
     return this.#events(camera, atMs / 1000, atMs / 1000).findLast((event) => covers(event, atMs)) ?? null;
   }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The outline of weeks: what of the cameras was recorded and reported, as fine as the screen's pixels.
+// The outline of weeks: what was recorded and reported of the cameras, as fine as the screen's pixels.
 //
 // Why so        Months of events are more than a page can fetch and draw in time. The server joins what is smaller than
 //               a pixel, so that one answer has what is shown and as much again around it, to be dragged into view.
@@ -9,7 +9,7 @@ import type { LaneOutline, Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { RequestQueue } from "./request_queue";
 
-/** The most steps that the server answers for at once. */
+/** The most steps that the server takes in one request. */
 const kMaxSteps = 20_000;
 /** A span that reaches the present is fetched again after that. */
 const kMaxAgeS = 30;
@@ -37,7 +37,7 @@ export class FootageOutline {
   readonly #changed: () => void;
   readonly #requests = new RequestQueue();
   #known: Outline | null = null;
-  /** The request whose answer is wanted. */
+  /** The last request; the answers to others are dropped. */
   #wanted = "";
 
   /** `changed` is called when more is known. */
@@ -61,7 +61,7 @@ export class FootageOutline {
     const endMs = startMs + widthPx * msPerPx;
     const isKnown = this.#known?.stepS === stepS && cameras.every((camera) => this.covers(camera, startMs, endMs));
     if (isKnown || cameras.length === 0) return;
-    // Of what is to come nothing is known.
+    // Nothing is recorded in the future.
     const untilS = Math.max(fromS + 1, Math.min(toS, Math.ceil(Date.now() / 1000)));
     const key = `${fromS} ${untilS} ${stepS} ${cameras.join()}`;
     this.#wanted = key;
@@ -90,7 +90,7 @@ export class FootageOutline {
     try {
       for (const lane of await this.#recordings.outline(fromS, toS, stepS, cameras)) lanes.set(lane.camera_id, lane);
     } catch (error) {
-      // A host without an event API.
+      // The host has no event API.
       if (!(error instanceof ServerError) || error.status !== kNoSuchApi) throw error;
     }
     return lanes;

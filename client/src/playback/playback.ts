@@ -84,7 +84,7 @@ export class Playback {
       return await this.#whatFollows(await this.#showFrames(from, signal), signal);
     } catch (error) {
       const failure = asServerError(error);
-      // A stream that has shown a picture can be had again.
+      // A stream that has shown a picture can be opened again.
       if (!shown.hasBegun || !isPassing(failure)) throw failure;
       return this.#isOver(from, performance.now() - begunMs) ? "ended" : "lost";
     } finally {

@@ -55,7 +55,7 @@ export class App {
   /** Null at the log-in. */
   #screen: Screen | null = null;
   #watching: AbortController | null = null;
-  /** As long as the server has none. */
+  /** Whether the server has no account yet. */
   #isWithoutAccounts = false;
 
   constructor(root: HTMLElement) {

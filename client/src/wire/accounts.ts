@@ -7,7 +7,7 @@ import type { Server } from "./server";
 
 export const kPrivileges = ["viewer", "manager", "owner"] as const;
 export type Privilege = (typeof kPrivileges)[number];
-/** What a right to a camera can be denied for. Export is of recordings as files; there is none without playback. */
+/** The rights to a camera that can be denied. Export, of recordings as files, needs playback too. */
 export const kCameraRights = ["live", "audio", "playback", "export"] as const;
 export type CameraRight = (typeof kCameraRights)[number];
 

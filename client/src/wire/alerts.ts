@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What was reported since the user looked, and at which cameras just now.
+// The alerts and POS transactions that were reported since the user last looked, and the cameras that have new ones.
 //
 // Why so        The stream of reports continues where the user last looked, also after the page was left. So what is
 //               new is counted again from the store, and is the same in all tabs of a browser; where the user looks in

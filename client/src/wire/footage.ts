@@ -45,7 +45,7 @@ export interface Footage extends FootageRef {
   reporter: string;
   /** There is something to play. */
   isSaved: boolean;
-  /** Retention leaves it alone. Of a mark known only where it was looked up by itself. */
+  /** Retention leaves it alone. Known of a mark only where it was looked up by itself. */
   isKept: boolean;
   /** Why it is kept, and which account says so; empty where that is not known. */
   note: string;

@@ -95,10 +95,10 @@ const kPlayer = "VEXO.Lookhaven.Player";
 const kKinds: Record<FootageKind, number> = { event: 0, alert: 1, pos: 2 };
 /** Beyond the last frame of any recording, yet far below the limit of the server's 32 bits. */
 const kFarFrame = 1_000_000_000;
-/** As many as the server lists at once. */
+/** The most that the server lists at once. */
 const kMaxMarks = 10_000;
 const kMaxKey = 2 ** 31 - 1;
-/** As many as are found by their texts. */
+/** The most that a search for a text returns. */
 export const kMaxFound = 500;
 
 /** A stream's name, by which its rate is set. The server takes 31 bits; a random one meets no other tab's. */
@@ -139,7 +139,7 @@ export class Recordings {
     return (answer.available_day ?? []).map((day) => day === 1);
   }
 
-  /** What there is in the span, no finer than `stepS`. */
+  /** The outline of the span, no finer than `stepS`; cameras without footage are absent. */
   async outline(fromS: number, toS: number, stepS: number, cameras: readonly number[]): Promise<(LaneOutline & { camera_id: number })[]> {
     const span = { from: String(fromS), to: String(toS), step: String(stepS) };
     const asked = { ...span, cameralists: cameras.join() };

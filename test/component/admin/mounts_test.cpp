@@ -45,7 +45,7 @@ TEST(MountForecast, IsTheLeastOfLimitsAndRoom) {
         {"an age limit", {.free_bytes = 100, .max_age_s = 3 * kDay, .bytes_per_day = 10}, 3},
         {"an age that is never reached", {.free_bytes = 100, .max_age_s = 30 * kDay, .bytes_per_day = 10}, 10},
         {"an age limit and nothing recorded", {.free_bytes = 100, .max_age_s = kDay / 2}, 0.5},
-        {"a disk that is away", {.used_bytes = 50, .is_there = false, .bytes_per_day = 10}, -1},
+        {"a disk that is not mounted", {.used_bytes = 50, .is_there = false, .bytes_per_day = 10}, -1},
         {"its limit", {.is_there = false, .max_bytes = 80, .bytes_per_day = 10}, 8},
     };
     for (const auto& row : rows) {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Server and VEXO.Pairing: a code is shown to managers with their password, and whoever guesses at it is slowed
-// down and keeps nobody out.
+// VEXO.Server and VEXO.Pairing: a code is shown to managers with their password, and a client that guesses at it is
+// slowed down and keeps nobody out.
 #include <cstdlib>
 #include <filesystem>
 

@@ -16,7 +16,7 @@ namespace {
 
 using namespace archive;
 
-constexpr std::int64_t kFarFuture = 4'000'000'000'000;  // whoever waits for the clock waits long
+constexpr std::int64_t kFarFuture = 4'000'000'000'000;  // a wait for the clock would be long
 
 std::vector<std::int64_t> Times(const RecordingReader& recording) {
     std::vector<std::int64_t> times;

@@ -43,7 +43,7 @@ inline base::FileDescriptor BindPort(int& port) {
     return listener;
 }
 
-// Gives that answer to whoever asks.
+// Gives that answer to every request.
 class FakeHost {
   public:
     FakeHost(base::FileDescriptor listener, const char* answer) : listener_(std::move(listener)) {

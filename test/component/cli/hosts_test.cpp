@@ -77,7 +77,7 @@ TEST_F(CliHostsTest, TheFirstOneKeepsItsMountsAndOthersAddTheirOwn) {
     installation.SetHostId(0);
     std::filesystem::create_directory(folder_ / "disk");
     const std::string add_mount = "mount add " + (folder_ / "disk").string() + " --name other";
-    Play({{add_mount, 65, "none of them"},
+    Play({{add_mount, 65, "not one of them"},
           {added, 65, "already a host"},
           {"host add --name nvr2 --address nvr2.example", 0, "Added"},
           {add_mount, 0, "Added mount other"},

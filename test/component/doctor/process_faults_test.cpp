@@ -57,7 +57,7 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
              EXPECT_EQ(Run("camera set 1 --insecure").code, 0);
              WriteStatus({})();
          }},
-        {"camera whose mount is away", WriteStatus({mount_gone}), "do: check that its mount is enabled",
+        {"camera whose disk is missing", WriteStatus({mount_gone}), "do: check that its mount is enabled",
          WriteStatus({})},
         {"camera without event ids", WriteStatus({no_id}), "do: repair the store", WriteStatus({})},
         {"another recorder", Sql("update recorder_lease set holder = '/var on nvr2'"), "/var on nvr2",
@@ -145,7 +145,7 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
     };
     const std::string host_file = home_.string() + "/host";
     const Fault faults[] = {
-        {"none of the hosts", add_host(1), "this machine is none of the hosts", Sql("delete from hosts")},
+        {"not one of the hosts", add_host(1), "this machine is not one of the hosts", Sql("delete from hosts")},
         {"host that is offline",
          [&] {
              add_host(1)();

@@ -238,7 +238,7 @@ TEST(Host, ServesASocketHandedOver) {
     EXPECT_EQ(host.Ask("api=Test&version=1&method=Success", host.LogIn().secret).status, 200);
     const std::filesystem::path socket = host.Home().WebApiSocket();
     host.End(SIGTERM);
-    EXPECT_TRUE(std::filesystem::exists(socket)) << "whoever opened it removes it";
+    EXPECT_TRUE(std::filesystem::exists(socket)) << "its creator removes it";
 }
 
 }  // namespace

@@ -132,14 +132,14 @@ void HostsTest::ExpectSound() {
     }
 }
 
-void HostsTest::SetStoreAway(bool is_away) const {
+void HostsTest::SetStoreUnreachable(bool is_unreachable) const {
     const std::string host = url_.substr(url_.find("host=") + 5, url_.find(' ') - url_.find("host=") - 5);
     const std::string database = url_.substr(url_.find("dbname=") + 7);
     const std::string command = "/usr/lib/postgresql/15/bin/psql -q -h " + host +
                                 " -U postgres -d postgres -c 'alter database " + database + " allow_connections " +
-                                (is_away ? "false" : "true") + "' -c \"select pg_terminate_backend(pid)" +
+                                (is_unreachable ? "false" : "true") + "' -c \"select pg_terminate_backend(pid)" +
                                 " from pg_stat_activity where datname = '" + database + "' and " +
-                                (is_away ? "true" : "false") + "\" >/dev/null";
+                                (is_unreachable ? "true" : "false") + "\" >/dev/null";
     ASSERT_EQ(std::system(command.c_str()), 0);
 }
 

@@ -53,7 +53,7 @@ class HostsTest : public testing::Test {
     static TemporaryPostgres& Server();
 
     Machine& AddMachine() { return machines_.emplace_back(url_); }
-    // All of them run and say that they have room.
+    // Starts that many hosts and waits until each has reported that it has room.
     void StartHosts(int count);
 
     int AddCamera(int fixed_host = 0);
@@ -63,12 +63,11 @@ class HostsTest : public testing::Test {
     std::map<int, std::multiset<int>> Recorded();
     bool EventuallyRecorded(const std::map<int, std::multiset<int>>& expected);
 
-    // Of each camera, the recordings of different hosts follow one another, but for the second that ends are rounded
-    // to.
+    // For each camera: the recordings of different hosts do not overlap, but for the second that ends are rounded to.
     void ExpectNeverRecordedTwice();
     void ExpectSound();
-    // The store refuses everybody, as a server that was stopped.
-    void SetStoreAway(bool is_away) const;
+    // While set the store refuses all connections, like a server that was stopped.
+    void SetStoreUnreachable(bool is_unreachable) const;
 
     const std::string url_;
     store::Store store_;

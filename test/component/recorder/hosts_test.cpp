@@ -96,7 +96,7 @@ TEST_F(HostsTest, AStoreThatNobodyReachesMovesNothing) {
     for (const store::Event& event : store::Events(store_).Open()) {
         ids.insert(event.id);
     }
-    SetStoreAway(true);
+    SetStoreUnreachable(true);
     const auto written = [this](std::size_t machine) {
         std::uintmax_t bytes = 0;
         for (const auto& file : fs::recursive_directory_iterator(machines_[machine].Folder())) {
@@ -110,7 +110,7 @@ TEST_F(HostsTest, AStoreThatNobodyReachesMovesNothing) {
         return std::chrono::steady_clock::now() - away_since > std::chrono::seconds(6) &&
                written(0) > before[0] + 50'000 && written(1) > before[1] + 50'000;
     })) << "recording continues";
-    SetStoreAway(false);
+    SetStoreUnreachable(false);
     store_ = store::Store::Open(url_);
     const auto heartbeats = [this] {
         std::vector<std::int64_t> counts;
@@ -141,7 +141,8 @@ TEST_F(HostsTest, AMachineThatIsNoHostOrASecondOneOfItRecordsNothing) {
     Machine& stranger = AddMachine();
     stranger.Start();
     EXPECT_TRUE(Eventually([&] { return copy.Log().find("records the cameras of this host") != std::string::npos; }));
-    EXPECT_TRUE(Eventually([&] { return stranger.Log().find("this machine is none of them") != std::string::npos; }));
+    EXPECT_TRUE(
+        Eventually([&] { return stranger.Log().find("this machine is not one of them") != std::string::npos; }));
     EXPECT_EQ(Recorded(), (std::map<int, std::multiset<int>>{{1, {camera}}}));
     store::Hosts(store_).Remove(1);
     EXPECT_TRUE(

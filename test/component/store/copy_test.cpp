@@ -84,7 +84,7 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Settings(copy).Find("installation"), Settings(store_).Find("installation"));
         EXPECT_EQ(Events(copy).List({.camera_ids = {1}}), Events(store_).List({.camera_ids = {1}}));
         EXPECT_EQ(Marks(copy).List({.camera_ids = {1}, .words = TextQuery("tea")}).size(), 1U);
-        EXPECT_EQ(RecorderLease(copy).Current().holder, "") << "whoever held it records into the other store";
+        EXPECT_EQ(RecorderLease(copy).Current().holder, "") << "its holder records into the other store";
         EXPECT_EQ(RecorderLease(copy, 2).Current().holder, "") << "likewise";
         EXPECT_THAT(Hosts(copy).All(), testing::SizeIs(2));
         EXPECT_THAT(Mounts(copy).List(), Each(testing::Field(&Mount::path, "/srv/footage")));

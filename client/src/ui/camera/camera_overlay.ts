@@ -54,7 +54,7 @@ export class CameraOverlay {
     this.#large.focus();
   }
 
-  /** Of the large view. */
+  /** The keys of the large view. */
   get keys(): KeyList {
     const step: KeyList = this.#actions.step ? [["Left Right", "The camera before or after"]] : [];
     return [["Esc", "Back"], ...step, ["S", "Snapshot"], ["M", "Sound on or off"], ["F", "Full screen"]];

@@ -15,7 +15,7 @@ import { calendarDate, clockTime, spanInWords } from "../widgets/text";
 const kDenied = "You may play the recordings of this camera, but not export them";
 const kDebounceMs = 300;
 const kAroundMs = 60_000;
-/** As the server has them. */
+/** The server's limits. */
 const kMaxCameras = 16;
 const kMaxSpanMs = 86_400_000;
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Asks the server again until it answers, so that a screen that was opened while the server was away fills by itself.
+// Asks the server again until it answers, so that a screen that was opened while the server was unreachable fills by
+// itself.
 
 import { Backoff } from "../../live/backoff";
 import { delay } from "../../wire/delay";

@@ -21,7 +21,7 @@ import type { RememberedState, Session } from "./session";
 
 const kRefreshMs = 500;
 const kStatesIntervalMs = 3_000;
-/** The host's own number for a map that does not exist or is denied; a web server whose host is away has none. */
+/** The host's own number for a map that does not exist or is denied; a web server whose host does not run has none. */
 const kNoSuchMap = 502;
 
 export class MapsScreen extends Screen {

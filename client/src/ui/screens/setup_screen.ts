@@ -72,7 +72,7 @@ export function noAccountScreen(askAgain: () => Promise<void>): HTMLElement {
   const message = element("p", { class: "login-message", role: "status" });
   again.addEventListener("click", () => {
     message.textContent = "";
-    void askAgain().then(() => (message.textContent = "There is still none."));
+    void askAgain().then(() => (message.textContent = "There is still no account."));
   });
   const body = element(
     "div",

@@ -168,7 +168,7 @@ export class WallScreen extends Screen {
     this.#refresh();
   }
 
-  /** Where they cannot be had, those of before stay: no camera is missed for it. */
+  /** Where they cannot be fetched, those fetched before stay, so no camera is reported as missing. */
   async #loadGroups(): Promise<void> {
     this.#contents.groups = await this.#recordings.groups().catch(() => this.#contents.groups);
   }
@@ -258,7 +258,7 @@ export class WallScreen extends Screen {
     this.#status.classList.toggle("alarm", this.#error !== "" || lost.length > 0);
   }
 
-  /** As its tile knows it; where that does not look, because nobody sees it, as the recorder does. */
+  /** As its tile knows it; for a tile out of sight, which has no stream, as the recorder reports it. */
   #isLost(camera: Camera): boolean {
     const state = this.#grid.tile(camera.id)?.picture.state() ?? { kind: "idle" };
     return state.kind === "lost" || (state.kind === "idle" && this.server.signalLosses.of(camera) !== null);

@@ -13,7 +13,7 @@ export interface Page {
   readonly root: HTMLElement;
   /** Whether something would be lost by leaving. */
   readonly isChanged: boolean;
-  /** What of it can be taken up again after the session has ended. */
+  /** What can be restored after the session has ended. */
   readonly draft: Draft | null;
   /** Ends all that the page has running. */
   close(): void;

@@ -39,7 +39,7 @@ export interface TimelineActions extends ScrubActions {
   stillAddress(footage: Footage, atMs: number, widthPx: number): string;
 }
 
-/** Of more than this an outline is fetched and drawn, instead of each event. */
+/** For longer spans an outline is fetched and drawn, instead of each event. */
 const kMaxEventsSpanMs = 4 * 86_400_000;
 const kMarkPx = 6;
 const kKeyZoom = 1.6;
@@ -59,7 +59,7 @@ export class Timeline {
     class: "timeline-lanes",
     tabindex: "0",
     role: "slider",
-    // Seconds; what is told is the text.
+    // In seconds; screen readers say the text.
     "aria-valuemin": "0",
     "aria-valuemax": String(2 ** 32),
     "aria-valuenow": "0",
@@ -194,7 +194,7 @@ export class Timeline {
   }
 
   #show(scale: TimeScale): void {
-    // There is nothing to see of the future.
+    // The future is empty.
     const beyondMs = scale.endMs - (Date.now() + scale.spanMs * kMaxAhead);
     this.#scale = beyondMs > 0 ? scale.panned(beyondMs / scale.msPerPx) : scale;
     this.#actions.moved();
@@ -230,7 +230,7 @@ export class Timeline {
     this.#lanes.forEach(({ camera }, index) => {
       paintLane(context, scale, colours, this.#contentOf(camera), index * lanePx, lanePx, this.#selected);
     });
-    // What was recorded there may have come to be known just now.
+    // What was recorded there may have been fetched just now.
     if (this.#hint.withoutStill) this.#showHint(this.#hint.withoutStill);
     if (this.#playheadMs === null) return;
     const x = scale.xOf(this.#playheadMs);

@@ -32,11 +32,11 @@ export function chosenOf(outline: LaneOutline, kinds: ReadonlySet<EventKind>): L
   };
 }
 
-/** Each at least 3 : 1 on the page, and told from the one before. */
+/** Each has a contrast of at least 3 : 1 to the page, and differs from the one before. */
 const kRecorded = "#5a6672";
 const kContinuous = "#7b8896";
 const kSelected = "#c3ced8";
-/** An event that is as wide is told from its neighbours. */
+/** Events of this width or more are drawn apart from their neighbours. */
 const kMinSinglePx = 2;
 
 export function paintLane(

@@ -49,7 +49,7 @@ export class TimelineScrubber {
     return this.#atMs !== null;
   }
 
-  /** Whether the pointer that was released last has dragged the playhead, so that its click is none. */
+  /** Whether the pointer that was released last has dragged the playhead, so that its click is ignored. */
   get hasMoved(): boolean {
     return this.#hasMoved;
   }

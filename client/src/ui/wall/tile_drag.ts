@@ -7,7 +7,7 @@ const kDragPx = 8;
 
 /**
  * Lets the mouse drag the children of `grid` to other places; a finger scrolls instead. `moved` is called when one is
- * dropped elsewhere. The click at the end of a drag is none.
+ * dropped elsewhere. The click at the end of a drag is ignored.
  */
 export function dragToOrder(grid: HTMLElement, moved: () => void): void {
   grid.addEventListener("pointerdown", (pressed) => {

@@ -63,7 +63,7 @@ export class PanZoomPointers {
     return this.#pointers.size > 0;
   }
 
-  /** Whether the pointer has moved since it was pressed: then the click that follows is none. */
+  /** Whether the pointer has moved since it was pressed: then the click that follows is ignored. */
   get hasMoved(): boolean {
     return this.#hasMoved;
   }

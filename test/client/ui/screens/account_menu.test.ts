@@ -46,7 +46,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await page.getByText("2 sessions ended.").waitFor();
     await vi.waitFor(async () => expect(await dialog.locator("tbody tr").allInnerTexts()).toEqual([expect.stringMatching(/192\.0\.2\.1/)]));
     expect(await dialog.getByRole("button", { name: "End all others" }).isDisabled()).toBe(true);
-    expect(setup.asked, "of whoever asks").toEqual([["EndSessions", { key: "b" }], ["EndSessions", {}]]);
+    expect(setup.asked, "the caller's own").toEqual([["EndSessions", { key: "b" }], ["EndSessions", {}]]);
     await page.keyboard.press("Escape");
     await dialog.waitFor({ state: "detached" });
   }, 40_000);

@@ -7,7 +7,7 @@ import { hasBrowser, isFirefox, ServedClient } from "../../support/served_client
 describe.skipIf(!hasBrowser)("in a browser", () => {
   const client = new ServedClient();
 
-  // Of Firefox, playwright cannot read what a request sends.
+  // Playwright cannot read what a request of Firefox sends.
   test.skipIf(isFirefox)("changes that are not saved are asked about on every way out, and stay where the user does", async () => {
     client.server.hasSession = true;
     const place = { id: 1, hxId: 0, name: "Entrance", x: 5, y: 5, direction: 0, textPos: 0, iconCenterX: 0, iconCenterY: 0 };

@@ -67,7 +67,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await page.getByText("lookhaven setup-address").waitFor();
     expect(await page.locator("input").count()).toBe(0);
     await page.getByRole("button", { name: "Check again" }).click();
-    await page.getByText("There is still none.").waitFor();
+    await page.getByText("There is still no account.").waitFor();
     await page.evaluate(() => void (location.hash = "#setup=beef"));
     await page.getByLabel("Account").waitFor();
     await page.evaluate(() => void (location.hash = "#"));

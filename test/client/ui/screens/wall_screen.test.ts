@@ -145,7 +145,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     expect(await page.textContent(".sound")).toBe("Sound on");
     const { sounds, pictures } = (await page.evaluate(() => ({ ...document.body.dataset }))) as Record<string, string>;
     const seenMs = pictures!.split(" ").map(Number);
-    // Of the first second, in which the picture begins to wait for the sound, nothing is asked.
+    // The first second, in which the picture begins to wait for the sound, is not checked.
     const offsetsMs = sounds!
       .split(" ")
       .slice(2)
@@ -164,7 +164,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     expect([await tiles(), await page.textContent(".bar-status")]).toEqual([["1", "2"], "2 of 4 cameras"]);
     const lost = { state: "no-signal", no_signal: { since: 0, cause: "refused" } };
     server.answers = { CameraStates: { recorder: true, camera: [1, 4, 9].map((id) => ({ id, ...lost })) } };
-    // Of these, camera 1 has its picture again, and camera 9 is none of the account's.
+    // Camera 1 has its picture again, and the account may not see camera 9.
     await page.locator(".bar-status[title$=': Camera <b>4</b>']", { hasText: /^2 of 4 cameras · 1 without signal$/ }).waitFor();
     server.answers = {};
     await page.focus("[data-camera='1'] .tile-open");

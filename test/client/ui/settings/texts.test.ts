@@ -94,7 +94,7 @@ test.each([
   expect(hostAndPort(typed, port)).toEqual({ address, port: expected });
 });
 
-test("a name that leads nowhere else is no address for another host", () => {
+test("a loopback address is no address for another host", () => {
   const names = ["localhost", "127.0.0.1", "[::1]", "nvr.example", "[2001:db8::1]"];
   expect(names.map((hostname) => ownAddress({ hostname }))).toEqual([null, null, null, "nvr.example", "2001:db8::1"]);
 });

@@ -22,7 +22,7 @@ export class AccountFields implements RecordFields<AccountSettings> {
   readonly #password: TextField;
   readonly #again = secretField("Repeat password");
   readonly #privilege: Field<UserSettings["privilege"]>;
-  readonly #mayMark = checkField("Report alerts and POS transactions", "For devices and cash registers.");
+  readonly #mayMark = checkField("Report alerts and POS transactions", "For devices and POS terminals.");
   readonly #rights: RightsMatrix;
 
   /** `ownId` is the account that is at the page. */

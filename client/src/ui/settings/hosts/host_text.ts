@@ -15,7 +15,7 @@ export function hostAndPort(typed: string, port: number | null): { address: stri
   return { address: inBrackets ?? plain ?? host, port: ownPort ? Number(ownPort) : (port ?? kUsualPort) };
 }
 
-/** Where the page's own host is reached by others; null where the page only knows a name that leads nowhere else. */
+/** The address at which others reach the page's own host; null where the page only knows a loopback address. */
 export function ownAddress(page: { hostname: string }): string | null {
   const name = page.hostname.replace(/^\[|\]$/g, "");
   return /^(localhost|127\..*|::1)$/.test(name) ? null : name;

@@ -43,7 +43,7 @@ function countedText(count: number, noun: string): string {
   return [counted(count, first), ...rest].join(" ");
 }
 
-/** The command that a remedy begins with, ready for a shell; null for a remedy that is none. */
+/** The command that a remedy begins with, ready for a shell; null where a remedy has no command. */
 export function commandOf(remedy: Finding["remedy"]): string | null {
   const found = /^(?:as root: )?((?:(?:lookhaven|chmod|chown|ipcrm|systemctl) |mount -)(?:'[^']*'|[^'])*?)(?:[,;] .*)?$/.exec(remedy);
   return found?.[1] ?? null;
