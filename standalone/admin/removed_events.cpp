@@ -2,11 +2,13 @@
 #include "standalone/admin/removed_events.h"
 
 #include <array>
+#include <exception>
 #include <optional>
 #include <string>
 
 #include "standalone/admin/change.h"
 #include "standalone/archive/layout.h"
+#include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
@@ -62,14 +64,22 @@ Change RemoveMark(store::Store& store, const store::Mark& mark) {
         "event.remove", ObjectOf(store, what, mark.camera_id, mark.id), was_there ? SpanOf(mark) : Json::Value(), {}};
 }
 
-// A span file names the recordings of a mark's footage; it holds no footage itself.
+// The file names recordings, and holds none. The mark's row is gone by now, so what fails is only logged.
 void RemoveSpanFile(store::Store& store, const store::Mark& mark) {
-    const auto name = archive::ParsePath(mark.path);
-    const auto mount = store::Mounts(store).Find(mark.mount_id);
-    const auto folder = mount ? maintenance::OpenMount(store, *mount) : std::nullopt;
-    if (folder && name && name->kind == archive::FileKind::kSpan) {
-        folder->Remove(*name);
+    std::string why = "its mount is not mounted here";
+    try {
+        const auto name = archive::ParsePath(mark.path);
+        const auto mount = store::Mounts(store).Find(mark.mount_id);
+        const auto folder = mount ? maintenance::OpenMount(store, *mount) : std::nullopt;
+        if (folder && name && name->kind == archive::FileKind::kSpan) {
+            folder->Remove(*name);
+            return;
+        }
+    } catch (const std::exception& error) {
+        why = error.what();
     }
+    base::LogWarning("the file " + mark.path + " of event " + std::to_string(mark.id) + " was not removed: " + why +
+                     "; it holds the times of its footage, and no pictures");
 }
 
 }  // namespace

@@ -16,8 +16,7 @@ namespace lookhaven::admin {
 // Recordings, a mark with its text, or both, all or nothing. No search finds them once this returns; the
 // recorder that maintains their mount then deletes the recordings' files, within seconds while it runs, with the
 // marks that have no other footage. Throws StillNeeded where one is kept or still being recorded, or the mark's
-// footage may still come; what Apply throws; and std::system_error where the mark's file stays, without footage and
-// row.
+// footage may still come; and what Apply throws. Where the mark's span file stays, that is only logged.
 void RemoveEvents(store::Store& store, const Actor& actor, std::span<const store::Event> recordings,
                   const std::optional<store::Mark>& mark);
 

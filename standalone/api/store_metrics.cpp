@@ -2,9 +2,12 @@
 #include "standalone/api/store_metrics.h"
 
 #include <algorithm>
+#include <exception>
+#include <string>
 #include <vector>
 
 #include "standalone/base/clock.h"
+#include "standalone/base/log.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/host_status.h"
 #include "standalone/store/camera_leases.h"
@@ -18,9 +21,14 @@ namespace {
 
 void AddStates(MetricsText& text, const base::Installation& installation, store::Store& records) {
     const std::vector<store::Host> hosts = store::Hosts(records).All();
-    const bool is_watching = control::FindRecorder(installation) == control::RecorderState::kAlive;
-    const auto states =
-        is_watching ? maintenance::ReadHostStatus(installation) : std::vector<maintenance::HostStatus>();
+    std::vector<maintenance::HostStatus> states;
+    try {
+        if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
+            states = maintenance::ReadHostStatus(installation);
+        }
+    } catch (const std::exception& error) {  // the other figures are known all the same
+        base::LogWarning(std::string("cannot read which hosts are online: ") + error.what());
+    }
     text.Family("lookhaven_host_up", "gauge",
                 "Whether the host's recorder runs and reaches the store, as this host's recorder sees it.");
     for (const store::Host& host : hosts) {

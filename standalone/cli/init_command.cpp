@@ -151,15 +151,6 @@ void RenewMarkers(store::Store& store) {
     }
 }
 
-// Gives other hosts the pictures of this host's e-maps; until then only this host shows them.
-void SharePictures(store::Store& store, const base::Installation& installation) {
-    try {
-        emap::Pictures(store, installation.Home()).Share();
-    } catch (const store::StoreError& error) {
-        base::LogError(Concat("other hosts lack pictures of e-maps: ", error.what()));
-    }
-}
-
 // Where there is no room for the copy the upgrade continues without one: cameras are not recorded meanwhile.
 void CopyOlderStore(const base::Installation& installation) {
     try {
@@ -191,7 +182,7 @@ void Init(const Console& console, const Request& request) {
     store::Store store = store::Store::Open(installation.StoreUrl());
     const bool mount_added = AddDefaultMount(store, installation, console);
     RenewMarkers(store);
-    SharePictures(store, installation);
+    emap::Pictures(store, installation.Home()).Share();
     try {
         FollowStateFolder(store, installation);
     } catch (const std::system_error& error) {  // such as a full disk, with which the services start all the same

@@ -147,17 +147,21 @@ void Pictures::Share() {
     if (store_.IsSqlite()) {
         return;
     }
-    store::EmapPictures shared(store_);
-    for (const std::string& name : shared.Missing()) {
-        try {
-            if (IsPictureName(name)) {
-                shared.Put(name, ReadFile(name), base::WallSeconds());
-            }
-        } catch (const std::system_error& error) {
-            if (error.code() != std::errc::no_such_file_or_directory) {
-                base::LogWarning(std::string("other hosts lack a picture of an e-map: ") + error.what());
+    try {
+        store::EmapPictures shared(store_);
+        for (const std::string& name : shared.Missing()) {
+            try {
+                if (IsPictureName(name)) {
+                    shared.Put(name, ReadFile(name), base::WallSeconds());
+                }
+            } catch (const std::system_error& error) {
+                if (error.code() != std::errc::no_such_file_or_directory) {
+                    base::LogWarning(std::string("other hosts lack a picture of an e-map: ") + error.what());
+                }
             }
         }
+    } catch (const store::StoreError& error) {
+        base::LogError(std::string("other hosts lack pictures of e-maps: ") + error.what());
     }
 }
 

@@ -47,7 +47,7 @@ class Pictures {
     void Sweep();
 
     // Puts those of this host's files that the store lacks into it, where several hosts may share it: pictures from
-    // before this host was one of them.
+    // before this host was one of them. What fails is logged, and tried again when it is called next.
     void Share();
 
     // The file's bytes, or the store's. Throws std::system_error when neither is there, also for a name that is not

@@ -5,7 +5,7 @@
 // Why so        A timeline that is dragged asks for the same hours again and again, and each answer covers hours of all
 //               cameras. So time is cut into spans of fixed borders; those that reach the present are fetched again.
 
-import type { Footage } from "../wire/footage";
+import { isSameFootage, type Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
 import { segmentsOf, type Segment } from "./coverage";
@@ -73,8 +73,10 @@ export class FootageCache {
     const segments: Segment[] = [];
     for (let start = first, before: Span | undefined; start <= last; start += kSpanS) {
       const span = this.#spans.get(keyOf(camera, start));
-      // What began in the span before is there already.
-      const isNew = (one: Footage) => !before || one.start >= start;
+      const known = before;
+      // The span before may have been fetched before the event was reported or stored.
+      const isKnown = (one: Footage) => [known?.events, known?.marks].some((list) => list?.some((other) => isSameFootage(other, one)));
+      const isNew = (one: Footage) => one.start >= start || !isKnown(one);
       if (span) footage.push(...span.events.filter(isNew), ...span.marks.filter(isNew));
       for (const segment of span?.segments ?? []) addSegment(segments, segment);
       before = span;

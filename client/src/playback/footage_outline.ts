@@ -60,7 +60,10 @@ export class FootageOutline {
     const { fromS, toS, stepS } = outlineOf(startMs, msPerPx, widthPx);
     const endMs = startMs + widthPx * msPerPx;
     const isKnown = this.#known?.stepS === stepS && cameras.every((camera) => this.covers(camera, startMs, endMs));
-    if (isKnown || cameras.length === 0) return;
+    if (isKnown || cameras.length === 0) {
+      this.#wanted = ""; // an answer that is still to come would replace what is known
+      return;
+    }
     // Nothing is recorded in the future.
     const untilS = Math.max(fromS + 1, Math.min(toS, Math.ceil(Date.now() / 1000)));
     const key = `${fromS} ${untilS} ${stepS} ${cameras.join()}`;

@@ -38,6 +38,9 @@ test("what reaches over the borders of spans is there once, wherever it is looke
     ] as const) {
       expect(idsOf(fromS, toS), `${fromS} to ${toS}`).toEqual(ids);
     }
+    archive.recorded.push(recorded(6, 3 * kSpanS - 100, 3 * kSpanS + 100));
+    await cache.load([1], kBorderS + 3 * kSpanS, kBorderS + 3 * kSpanS + 1);
+    expect(idsOf(2 * kSpanS, 3 * kSpanS + 1), "stored after the span where it begins was fetched").toEqual([5, 6]);
   } finally {
     vi.unstubAllGlobals();
   }

@@ -88,5 +88,10 @@ describe("an outline", () => {
     const shown = outline.get(1);
     await asked[0]!.answer();
     expect(outline.get(1)).toBe(shown);
+    load(20);
+    load(60);
+    await vi.advanceTimersByTimeAsync(0);
+    await asked[2]!.answer();
+    expect(outline.get(1), "the view is back before the answer comes").toBe(shown);
   });
 });
