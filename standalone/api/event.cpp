@@ -35,6 +35,7 @@ constexpr std::int64_t kMaxAheadSeconds = 300;  // a POS terminal's clock may be
 constexpr int kMaxListed = 10'000;
 constexpr int kMaxOffset = 100'000;
 constexpr int kMaxSteps = 20'000;
+constexpr std::int64_t kMaxCameraSteps = 400'000;  // all cameras' steps together, each of which may be a bar
 constexpr std::int64_t kMaxStepSeconds = 86'400;
 constexpr std::size_t kMaxCameras = 1'000;  // that a call may name
 
@@ -124,15 +125,16 @@ std::string Report(const Call& call) {
     }
 }
 
-// The cameras asked for, or all, without those that the caller may not play back.
-std::set<int> CamerasOf(const Call& call) {
+// The cameras asked for, or all, without those that the caller may not play back. Which these are must not decide
+// whether more than max_named are too many.
+std::set<int> CamerasOf(const Call& call, std::size_t max_named = kMaxCameras) {
     const Json::Value asked = call.Parameter("cameralists");
     std::set<int> ids;
     if (!asked.isNull()) {
         const std::list<int> numbers = String2IntList(asked.asString(), ",");
         ids.insert(numbers.begin(), numbers.end());
-        if (ids.size() > kMaxCameras) {
-            throw Failure(400, "cameralists names more than " + std::to_string(kMaxCameras) + " cameras");
+        if (ids.size() > max_named) {
+            throw Failure(400, "cameralists names more than " + std::to_string(max_named) + " cameras");
         }
         const std::set<int> denied = binding::DeniedCameras(store::CameraAccess::kPlayback);
         std::erase_if(ids, [&denied](int id) { return denied.contains(id); });
@@ -211,9 +213,15 @@ std::string Outline(const Call& call) {
         (end_s - begin_s) / step_s > kMaxSteps) {
         throw Failure(400, "from, to or step is out of its bounds");
     }
+    const auto max_cameras = static_cast<std::size_t>(
+        std::min<std::int64_t>(kMaxCameras, kMaxCameraSteps / std::max<std::int64_t>(1, (end_s - begin_s) / step_s)));
+    const std::set<int> cameras = CamerasOf(call, max_cameras);
+    if (cameras.size() > max_cameras) {
+        throw Failure(400, "that is too much for one answer: name fewer cameras, or ask for longer steps");
+    }
     Json::Value data;
     data["camera"] = Json::arrayValue;
-    for (const int camera : CamerasOf(call)) {
+    for (const int camera : cameras) {
         const store::Outline outline = store::OutlineOf(call.Records(), camera, begin_s, end_s, step_s);
         if (outline.IsEmpty()) {
             continue;  // like a camera that the caller may not see, or that does not exist

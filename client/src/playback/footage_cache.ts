@@ -28,7 +28,7 @@ interface Span {
 export class FootageCache {
   readonly #recordings: Recordings;
   readonly #changed: () => void;
-  readonly #requests = new RequestQueue();
+  readonly requests = new RequestQueue();
   readonly #spans = new Map<string, Span>();
   /** What `get` has put together, valid until a span changes. */
   readonly #merged = new Map<string, { version: number; footage: Footage[]; segments: Segment[] }>();
@@ -40,15 +40,6 @@ export class FootageCache {
     this.#changed = changed;
   }
 
-  get isBusy(): boolean {
-    return this.#requests.isBusy;
-  }
-
-  /** What the last request failed with, for the user; empty when it succeeded. */
-  get error(): string {
-    return this.#requests.error;
-  }
-
   /** Fetches what is not known of the cameras from `fromS` to `toS`; with `refresh` also what was incomplete. */
   async load(cameras: readonly number[], fromS: number, toS: number, refresh = false): Promise<void> {
     const last = Math.min(toS, Date.now() / 1000);
@@ -58,7 +49,7 @@ export class FootageCache {
         const span = this.#spans.get(keyOf(camera, start));
         return !span || (refresh && span.isOpen);
       });
-      if (missing.length > 0) work.push(this.#requests.run(`${start} ${missing}`, () => this.#fetch(missing, start)));
+      if (missing.length > 0) work.push(this.requests.run(`${start} ${missing}`, () => this.#fetch(missing, start)));
     }
     await Promise.all(work);
   }

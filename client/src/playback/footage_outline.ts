@@ -11,6 +11,8 @@ import { RequestQueue } from "./request_queue";
 
 /** The most steps that the server takes in one request. */
 const kMaxSteps = 20_000;
+/** The most that it takes for all cameras of a request together. */
+const kMaxCameraSteps = 400_000;
 /** A span that reaches the present is fetched again after that. */
 const kMaxAgeS = 30;
 const kNoSuchApi = 404;
@@ -35,7 +37,7 @@ export function outlineOf(startMs: number, msPerPx: number, widthPx: number): { 
 export class FootageOutline {
   readonly #recordings: Recordings;
   readonly #changed: () => void;
-  readonly #requests = new RequestQueue();
+  readonly requests = new RequestQueue();
   #known: Outline | null = null;
   /** The last request; the answers to others are dropped. */
   #wanted = "";
@@ -44,15 +46,6 @@ export class FootageOutline {
   constructor(recordings: Recordings, changed: () => void) {
     this.#recordings = recordings;
     this.#changed = changed;
-  }
-
-  get isBusy(): boolean {
-    return this.#requests.isBusy;
-  }
-
-  /** What the last request failed with, for the user; empty when it succeeded. */
-  get error(): string {
-    return this.#requests.error;
   }
 
   /** Fetches what is not known of the cameras as finely as that. */
@@ -68,7 +61,7 @@ export class FootageOutline {
     const untilS = Math.max(fromS + 1, Math.min(toS, Math.ceil(Date.now() / 1000)));
     const key = `${fromS} ${untilS} ${stepS} ${cameras.join()}`;
     this.#wanted = key;
-    void this.#requests.run(key, async () => {
+    void this.requests.run(key, async () => {
       const lanes = await this.#fetch(fromS, untilS, stepS, cameras);
       if (this.#wanted !== key) return;
       this.#known = { fromS, toS: untilS, stepS, lanes };
@@ -91,7 +84,11 @@ export class FootageOutline {
   async #fetch(fromS: number, toS: number, stepS: number, cameras: readonly number[]): Promise<Map<number, LaneOutline>> {
     const lanes = new Map<number, LaneOutline>(cameras.map((camera) => [camera, { continuous: [], alarm: [], alert: [], pos: [] }]));
     try {
-      for (const lane of await this.#recordings.outline(fromS, toS, stepS, cameras)) lanes.set(lane.camera_id, lane);
+      const perRequest = Math.floor(kMaxCameraSteps / Math.max(400, (toS - fromS) / stepS)); // the server takes 1,000 at most
+      for (let at = 0; at < cameras.length; at += perRequest) {
+        const some = await this.#recordings.outline(fromS, toS, stepS, cameras.slice(at, at + perRequest));
+        for (const lane of some) lanes.set(lane.camera_id, lane);
+      }
     } catch (error) {
       // The host has no event API.
       if (!(error instanceof ServerError) || error.status !== kNoSuchApi) throw error;

@@ -30,12 +30,12 @@ describe("an outline", () => {
 
   /** What is asked for, and its answers as they are given. */
   function loaded() {
-    const asked: { stepS: number; cameras: readonly number[]; answer(): Promise<void> }[] = [];
+    const asked: { steps: number; cameras: readonly number[]; answer(): Promise<void> }[] = [];
     const recordings = {
-      outline: (_fromS: number, _toS: number, stepS: number, cameras: readonly number[]) =>
+      outline: (fromS: number, toS: number, stepS: number, cameras: readonly number[]) =>
         new Promise((resolve) => {
           const lanes = cameras.map((camera) => ({ camera_id: camera, continuous: [[stepS, stepS]], alarm: [], alert: [], pos: [] }));
-          asked.push({ stepS, cameras, answer: async () => (resolve(lanes), vi.advanceTimersByTimeAsync(0).then(() => undefined)) });
+          asked.push({ steps: (toS - fromS) / stepS, cameras, answer: async () => (resolve(lanes), vi.advanceTimersByTimeAsync(0).then(() => undefined)) });
         }),
     };
     const outline = new FootageOutline(recordings as unknown as Recordings, () => undefined);
@@ -62,6 +62,18 @@ describe("an outline", () => {
       expect(asked.length).toBe(requests);
       await asked.at(-1)!.answer();
     }
+  });
+
+  test("of many cameras is asked for in parts that the server takes", async () => {
+    const { asked, outline, load } = loaded();
+    const cameras = Array.from({ length: 300 }, (_, i) => i + 1);
+    load(20, cameras);
+    for (let part = 0; !outline.get(300) && part < 300; part += 1) {
+      await vi.advanceTimersByTimeAsync(0);
+      await asked[part]!.answer();
+    }
+    expect(asked.flatMap((one) => one.cameras)).toEqual(cameras);
+    for (const one of asked) expect(one.cameras.length * one.steps).toBeLessThanOrEqual(400_000);
   });
 
   test("that reaches the present is asked for again after a while", async () => {

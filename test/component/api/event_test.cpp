@@ -69,6 +69,7 @@ TEST_F(EventApi, RefusesBadInput) {
     for (int id = 1; id <= 1001; ++id) {
         many += std::to_string(id) + ",";
     }
+    const std::string twenty = many.substr(0, many.find("21,"));
     const struct {
         std::string query;
         std::string form;  // empty: a GET
@@ -113,6 +114,8 @@ TEST_F(EventApi, RefusesBadInput) {
         {"Event&version=1&method=Outline&from=0&to=20&step=0", "", 400},
         {"Event&version=1&method=Outline&from=0&to=9223372036854775807&step=9223372036854775807", "", 400},
         {"Event&version=1&method=Outline&from=0&to=200000&step=5", "", 400},
+        {"Event&version=1&method=Outline&from=0&to=20000&step=1&cameralists=" + twenty, "", 200},
+        {"Event&version=1&method=Outline&from=0&to=20000&step=1&cameralists=" + twenty + "21", "", 400},
         {"Event&version=1&method=Next&kinds=alert,fire", "", 400},
         {"Event&version=1&method=Next&time=now", "", 400},
         {"Event&version=1&method=Frame&event=99", "", 404},

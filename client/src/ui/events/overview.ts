@@ -185,7 +185,7 @@ export class Overview {
     const recorded = this.#chosen
       .flatMap((camera) => this.cache.get(camera, fromS, toS).footage)
       .filter((one) => one.stop >= fromS && one.start < toS);
-    const isKnown = this.#cameras.length > 0 && !this.cache.isBusy && !this.cache.error;
+    const isKnown = this.#cameras.length > 0 && !this.cache.requests.isBusy && !this.cache.requests.error;
     const whyNone = isKnown ? whyNoEvents(this.filter, recorded.length, this.calendar) : "";
     listEvents(this.list, this.filter, recorded, span, whyNone);
   }

@@ -211,9 +211,9 @@ export class EventsScreen extends Screen {
     this.#playback.tick();
     this.#address.record();
     const { cache, outline, cameras, timeline } = this.#overview;
-    const error = this.#error || (timeline.showsEvents ? cache : outline).error;
+    const error = this.#error || (timeline.showsEvents ? cache : outline).requests.error;
     const empty = this.#isListed && cameras.length === 0 ? "No cameras" : "";
-    this.progress.hidden = !cache.isBusy && !outline.isBusy && (this.#isListed || error !== "");
+    this.progress.hidden = !cache.requests.isBusy && !outline.requests.isBusy && (this.#isListed || error !== "");
     setText(this.#status, error || empty);
     this.#status.classList.toggle("alarm", error !== "");
   }

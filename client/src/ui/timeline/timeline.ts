@@ -241,7 +241,7 @@ export class Timeline {
   /** Events, or the outline; both while the right one is being fetched, so that what is known stays in sight. */
   #contentOf(camera: number): LaneContent {
     const { startMs, endMs } = this.#scale;
-    const lane = !this.showsEvents || this.#cache.isBusy ? this.#outline.get(camera) : null;
+    const lane = !this.showsEvents || this.#cache.requests.isBusy ? this.#outline.get(camera) : null;
     const outline = lane && chosenOf(lane, this.#kinds);
     if (!this.showsEvents && this.#outline.covers(camera, startMs, endMs)) return { footage: [], segments: [], outline };
     const { footage, segments } = this.#cache.get(camera, startMs / 1000, endMs / 1000);
