@@ -35,7 +35,9 @@ await visit(async (page, complaints) => {
   // Reported while the events are on the screen in one of the tabs.
   await other.locator(".row", { hasText: "Fourth" }).first().waitFor({ timeout: 20_000 });
   // The list may show it before the stream of reports does, which makes it seen.
-  await page.waitForFunction(`(${lookOf})() !== ${JSON.stringify(look)}`);
+  for (const until = Date.now() + 20_000; (await page.evaluate(lookOf)) === look; await page.waitForTimeout(50)) {
+    if (Date.now() > until) throw new Error("the look at it is not known to the other tab");
+  }
   await other.close();
   await page.reload();
   await report("alone");

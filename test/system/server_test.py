@@ -64,6 +64,7 @@ class ServerTest(unittest.TestCase):
             said_by(BUILD / "bin/lookhaven", "--home", newer, "init")
             with contextlib.closing(sqlite3.connect(f"{newer}/lookhaven.db", isolation_level=None)) as store:
                 store.execute("update schema_version set version = 999")
+                store.execute("update settings set value = '999' where name = 'schema_compatible'")
             rows.append(("newer store", {"LOOKHAVEN_HOME": newer}, ["schema 999", "update Lookhaven"]))
             if os.geteuid() == 0:
                 rows.append(("folder of something else", {"LOOKHAVEN_HOME": folder}, [folder, "LOOKHAVEN_HOME"]))

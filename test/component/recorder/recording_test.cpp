@@ -176,6 +176,8 @@ TEST_P(RecordingTest, AnAlarmIsKeptWithOrWithoutARecordingAroundIt) {
         EXPECT_TRUE(Eventually([&] { return archive::RecordingReader(span).FrameCount() > 40; }))
             << "two seconds of footage at least";
         SetPlan(camera, store::RecordMode::kNever);
+        // The recorder is killed then, and a file that it writes would stay open.
+        ASSERT_TRUE(Eventually([&] { return Open().empty(); })) << Log();
     }
     ExpectSound();
 }
