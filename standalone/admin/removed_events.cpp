@@ -45,7 +45,9 @@ Change RemoveRecording(store::Store& store, const store::Event& recording) {
     if (recording.demo) {
         events.Remove(ids);
     } else {
-        events.BeginDeletion(ids);
+        if (events.BeginDeletion(ids) == 0 && current) {
+            throw StillNeeded("event " + std::to_string(recording.id) + " was changed meanwhile: try again");
+        }
     }
     return {"event.remove",
             ObjectOf(store, "event", recording.camera_id, recording.id),

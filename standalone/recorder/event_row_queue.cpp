@@ -193,9 +193,13 @@ void EventRowQueue::FillReserve(store::Store& store) {
 
 void EventRowQueue::StoreGrowth(store::Events& events, const std::vector<store::Event>& grown) {
     try {
-        if (!grown.empty()) {
-            events.Grow(grown);
+        const auto expected = static_cast<int>(grown.size());
+        const bool is_refused = expected > 0 && events.Grow(grown) < expected;
+        if (is_refused && !is_growth_refused_) {
+            base::LogWarning("the store does not take how far some recordings have come; it has their rows, and stores"
+                             " their ends when they are finished");
         }
+        is_growth_refused_ = is_refused;
     } catch (...) {
         const std::lock_guard lock(mutex_);
         for (const store::Event& row : grown) {

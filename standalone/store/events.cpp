@@ -52,15 +52,17 @@ int ForEachId(soci::session& sql, std::span<const int> ids, const std::string& t
     return changed;
 }
 
-void Move(Connection& connection, std::span<const int> ids, const std::string& from, const std::string& to,
-          const std::string& condition) {
+// Returns how many were moved.
+int Move(Connection& connection, std::span<const int> ids, const std::string& from, const std::string& to,
+         const std::string& condition) {
     const std::string columns = Mapping<Event>::kColumns;
     const std::string which = " from " + from + " where id = :id" + condition;
-    connection.Write([&](soci::session& sql) {
-        ForEachId(sql, ids, "insert into " + to + " (" + columns + ") select " + columns + which);
+    return connection.Write([&](soci::session& sql) {
+        const int copied = ForEachId(sql, ids, "insert into " + to + " (" + columns + ") select " + columns + which);
         ForEachId(sql, ids, "delete" + which + " and id in (select id from " + to + ")");
         // On PostgreSQL a row may have come to meet the condition, or no longer to meet it, between the two.
-        ForEachId(sql, ids, "delete from " + to + " where id = :id and id in (select id from " + from + ")");
+        const std::string not_moved = " where id = :id and id in (select id from " + from + ")";
+        return copied - ForEachId(sql, ids, "delete from " + to + not_moved);
     });
 }
 
@@ -139,8 +141,8 @@ int Events::Remove(std::span<const int> ids) {
         [&](soci::session& sql) { return ForEachId(sql, ids, "delete from events where id = :id"); });
 }
 
-void Events::BeginDeletion(std::span<const int> ids) {
-    Move(connection_, ids, "events", "events_pending_deletion", " and recording = 0 and archived = 0");
+int Events::BeginDeletion(std::span<const int> ids) {
+    return Move(connection_, ids, "events", "events_pending_deletion", " and recording = 0 and archived = 0");
 }
 
 void Events::BeginDeletionOfCamera(int camera_id) {

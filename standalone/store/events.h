@@ -136,9 +136,9 @@ class Events {
     int Remove(std::span<const int> ids);
 
     // Removing files with their rows. Until FinishDeletion or CancelDeletion the rows are found by PendingDeletion
-    // alone. Each is one transaction. BeginDeletion leaves out growing and kept events: remove the files of
-    // PendingDeletion only.
-    void BeginDeletion(std::span<const int> ids);
+    // alone. Each is one transaction. BeginDeletion leaves out growing and kept events, and returns how
+    // many there are without them: remove the files of PendingDeletion only.
+    int BeginDeletion(std::span<const int> ids);
     void FinishDeletion(std::span<const int> ids);
     void CancelDeletion(std::span<const int> ids);     // the rows are as before
     std::vector<Event> PendingDeletion(int mount_id);  // by id

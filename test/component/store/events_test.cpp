@@ -117,7 +117,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
     EXPECT_THROW(events_.Begin(event), AlreadyExists);
     EXPECT_THAT(Ids(events_.Open()), ElementsAre(event.id));
     EXPECT_THAT(events_.InRecordingOrder(event.mount_id, {}, 1), IsEmpty()) << "retention leaves an open one alone";
-    events_.BeginDeletion(std::array{event.id});
+    EXPECT_EQ(events_.BeginDeletion(std::array{event.id}), 0);
     EXPECT_THAT(events_.PendingDeletion(event.mount_id), IsEmpty());
     const auto grown = [&event](int id, std::int64_t length_s) {
         Event grown_event = event;
