@@ -105,9 +105,22 @@ std::map<int, std::multiset<int>> HostsTest::Recorded() {
     return recorded;
 }
 
+int HostsTest::OpenEventOf(int camera) {
+    for (const store::Event& event : store::Events(store_).Open()) {
+        if (event.camera_id == camera) {
+            return event.id;
+        }
+    }
+    return 0;
+}
+
 bool HostsTest::EventuallyRecorded(const std::map<int, std::multiset<int>>& expected) {
-    const bool is_so = Eventually(kLimit, [&] { return Recorded() == expected; });
-    EXPECT_EQ(Recorded(), expected);
+    std::map<int, std::multiset<int>> recorded;
+    const bool is_so = Eventually(kLimit, [&] {
+        recorded = Recorded();
+        return recorded == expected;
+    });
+    EXPECT_EQ(recorded, expected);
     return is_so;
 }
 

@@ -61,6 +61,8 @@ class HostsTest : public testing::Test {
     std::map<int, int> Holders();
     // Cameras by the host to whose mount they are being recorded.
     std::map<int, std::multiset<int>> Recorded();
+    // The id of what is being recorded of the camera, or was when its recorder died; 0: nothing.
+    int OpenEventOf(int camera);
     bool EventuallyRecorded(const std::map<int, std::multiset<int>>& expected);
 
     // For each camera: the recordings of different hosts do not overlap, but for the second that ends are rounded to.

@@ -31,7 +31,12 @@ TEST_F(HostsTest, CamerasOfAHostThatIsLostAreRecordedElsewhereAndStayThere) {
     }));
     EXPECT_EQ(Holders()[fixed], 1) << "it waits for its host";
     const auto before = Holders();
+    const int left_open = OpenEventOf(fixed);
     machines_[0].Start();
+    ASSERT_TRUE(Eventually(kLimit, [&] {
+        const int event = OpenEventOf(fixed);
+        return event != 0 && event != left_open;
+    }));
     auto expected = Recorded();
     expected[1] = {fixed};
     ASSERT_TRUE(EventuallyRecorded(expected));
