@@ -76,7 +76,8 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
             session_ << "pragma foreign_keys = on";
         } else {
             session_.open(Postgresql(), WithTimeouts(address.location));
-            session_ << "set statement_timeout = '5s'";
+            // Its parallel workers are processes to start, which takes longer than what they save of answers this short.
+            session_ << "set statement_timeout = '5s'; set max_parallel_workers_per_gather = 0";
         }
     } catch (const soci::soci_error& error) {
         const std::string problem = "cannot open the record store: " + error.get_error_message();

@@ -4,8 +4,10 @@
 //
 // Why so        In SQLite's index the row of a mark is its start and, in the lower 32 bits, its id: so the index itself
 //               gives the newest first, and a span of time is a part of it. Cameras and kinds are words there, too
-//               ("c5", "k1"), so that those of other cameras are not even looked at. PostgreSQL's planner chooses
-//               between its index of words and a walk along the time.
+//               ("c5", "k1"), so that those of other cameras are not even looked at. PostgreSQL's index holds the
+//               camera as an array of one (it has no other index of words and numbers without an extension); the
+//               planner chooses between it and a walk along the time, and looks the cameras up again as numbers, of
+//               which it knows how many there are.
 // See           schema.cpp, which keeps both in step with the marks.
 #include <algorithm>
 #include <string>
@@ -74,10 +76,11 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std
     }
     return FetchAll<Mark>(sql,
                           "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
-                          " and camera_id = any (cast(:cameras as integer[])) and start_s >= :earliest"
+                          " and array[camera_id] && cast(:cameras as integer[])"
+                          " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :earliest"
                           " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
                               OrderOf(filter, "start_s", "id"),
-                          words, cameras, earliest_s, filter.end_s, filter.begin_s,
+                          words, cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
                           filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
 }
 

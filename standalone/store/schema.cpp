@@ -269,6 +269,12 @@ constexpr const char* kEmapPictures[] = {
     ("create table emap_pictures (name text not null primary key, content text not null, touched_s bigint not null)"),
 };
 
+// With the camera in the index of words, for searches whose words are others' cameras'.
+constexpr const char* kMarkWordsByCameraOnPostgresql[] = {
+    "drop index marks_by_words",
+    "create index marks_by_words on marks using gin (mark_words(text), (array[camera_id]))",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -289,6 +295,10 @@ constexpr Migration kMigrations[] = {
     {"what accounts prefer", kPreferences},
     {"hosts that share the store", kHosts, kMountPathsOnSqlite, kMountPathsOnPostgresql},
     {.purpose = "pictures of e-maps that hosts share", .statements = kEmapPictures, .is_addition = true},
+    {.purpose = "the words in texts of marks by camera",
+     .statements = {},
+     .on_postgresql = kMarkWordsByCameraOnPostgresql,
+     .is_addition = true},
 };
 
 }  // namespace
