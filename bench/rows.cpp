@@ -17,9 +17,9 @@
 #include "standalone/archive/layout.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/installation.h"
+#include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/event_row_queue.h"
-#include "standalone/recorder/host_cameras.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
@@ -126,7 +126,7 @@ class Recorder {
     }
 
     recorder::EventRowQueue rows_;
-    recorder::HostCameras hosts_;
+    recorder::CameraLeaseKeeper hosts_;
     recorder::Catalog catalog_;
     store::Store store_;
     const int event_s_;

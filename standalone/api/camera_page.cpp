@@ -29,7 +29,7 @@ CameraPage::CameraPage(const Call& call, std::optional<int> camera_id)
     if (!is_recorder_alive_) {
         return;  // what it told last is stale
     }
-    for (maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+    for (maintenance::CameraStatus& status : maintenance::ReadCameraStatus(installation)) {
         states_.emplace(status.camera, std::move(status));
     }
     for (const control::StreamCounters& stream :

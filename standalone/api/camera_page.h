@@ -12,7 +12,7 @@
 
 #include "standalone/api/call.h"
 #include "standalone/control/stream_counters.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 
@@ -34,7 +34,7 @@ class CameraPage {
     std::vector<store::Camera> cameras_;
     bool is_recorder_alive_ = false;
     std::set<int> elsewhere_;  // recorded by another host, whose recorder tells nothing here
-    std::map<int, maintenance::RecordingStatus> states_;
+    std::map<int, maintenance::CameraStatus> states_;
     std::map<int, std::vector<control::StreamCounters>> streams_;  // by camera
     std::optional<std::map<int, store::CameraFootage>> footage_;
 };

@@ -13,7 +13,7 @@
 #include "standalone/api/named_list.h"
 #include "standalone/binding/rights.h"
 #include "standalone/control/common_config.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/emaps.h"
 #include "standalone/store/groups.h"
@@ -91,7 +91,7 @@ std::string Emaps(const Call& call) {
 }
 
 // The sentence may name addresses of the cameras' network, which are a manager's to know.
-Json::Value NoSignal(const maintenance::RecordingStatus& status, bool is_manager) {
+Json::Value NoSignal(const maintenance::CameraStatus& status, bool is_manager) {
     Json::Value json;
     json["since"] = status.lost_since_s;
     json["cause"] = std::string(base::NameOf(status.loss));
@@ -109,8 +109,8 @@ std::string CameraStates(const Call& call) {
     Json::Value data;
     data["recorder"] = is_known;
     Json::Value& list = data["camera"] = Json::arrayValue;
-    for (const maintenance::RecordingStatus& status :
-         is_known ? maintenance::ReadRecordingStatus(installation) : std::vector<maintenance::RecordingStatus>()) {
+    for (const maintenance::CameraStatus& status :
+         is_known ? maintenance::ReadCameraStatus(installation) : std::vector<maintenance::CameraStatus>()) {
         if (!binding::MayUse(status.camera, store::CameraAccess::kLive)) {
             continue;
         }

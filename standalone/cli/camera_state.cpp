@@ -14,7 +14,7 @@ CameraStates::CameraStates(const base::Installation& installation) {
         return;  // what it told last is stale
     }
     states_.emplace();
-    for (maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+    for (maintenance::CameraStatus& status : maintenance::ReadCameraStatus(installation)) {
         states_->emplace(status.camera, std::move(status));
     }
 }
@@ -25,7 +25,7 @@ void CameraStates::AddTo(Json::Value& camera) const {
         camera["state"] = !camera["enabled"].asBool() ? "disabled" : states_ ? "idle" : "unknown";
         return;
     }
-    const maintenance::RecordingStatus& status = states_->at(id);
+    const maintenance::CameraStatus& status = states_->at(id);
     camera["state"] = maintenance::NameOf(status.state);
     if (status.lost_since_s > 0) {
         camera["no_signal"] = Object("since", status.lost_since_s, "cause", std::string(base::NameOf(status.loss)),

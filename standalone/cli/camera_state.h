@@ -10,7 +10,7 @@
 #include <json/json.h>
 
 #include "standalone/base/installation.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 
 namespace lookhaven::cli {
 
@@ -24,7 +24,7 @@ class CameraStates {
     void AddTo(Json::Value& camera) const;
 
   private:
-    std::optional<std::map<int, maintenance::RecordingStatus>> states_;  // by id; nothing while no recorder runs
+    std::optional<std::map<int, maintenance::CameraStatus>> states_;  // by id; nothing while no recorder runs
 };
 
 // "no-signal since 2026-03-01 08:15:30 (refused)", from the two members.

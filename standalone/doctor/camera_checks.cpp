@@ -9,7 +9,7 @@
 #include "standalone/base/concat.h"
 #include "standalone/control/common_config.h"
 #include "standalone/doctor/checks.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/media/source_kinds.h"
 #include "standalone/ring/inventory.h"
 #include "standalone/store/cameras.h"
@@ -22,10 +22,10 @@ namespace {
 using base::Concat;
 using base::FormatMoment;
 using base::SignalLoss;
+using maintenance::CameraStatus;
 using maintenance::RecordingState;
-using maintenance::RecordingStatus;
 
-std::string TitleOf(const RecordingStatus& status) {
+std::string TitleOf(const CameraStatus& status) {
     return Concat("camera ", status.camera, " (", status.camera_name, ")");
 }
 
@@ -47,7 +47,7 @@ std::map<int, std::string> LiveSourceOptions(const base::Installation& installat
     return options;
 }
 
-std::string RemedyOf(const RecordingStatus& status, const std::string& source_option) {
+std::string RemedyOf(const CameraStatus& status, const std::string& source_option) {
     switch (status.loss) {
     case SignalLoss::kWrongPassword:
         return Concat("lookhaven camera set ", status.camera, " --account ACCOUNT");
@@ -64,7 +64,7 @@ std::string RemedyOf(const RecordingStatus& status, const std::string& source_op
     }
 }
 
-Finding NoSignal(const RecordingStatus& status, const std::map<int, std::string>& source_options) {
+Finding NoSignal(const CameraStatus& status, const std::map<int, std::string>& source_options) {
     const auto option = source_options.find(status.camera);
     return {Concat(TitleOf(status), " has sent no picture since ", FormatMoment(status.lost_since_s), ": ",
                    base::NameOf(status.loss), " (", status.loss_reason, ")"),
@@ -106,10 +106,10 @@ Findings CheckRecordings(const base::Installation& installation) {
         return {};  // stale
     }
     Findings findings;
-    const std::vector<RecordingStatus> cameras = maintenance::ReadRecordingStatus(installation);
+    const std::vector<CameraStatus> cameras = maintenance::ReadCameraStatus(installation);
     const bool is_one_down = std::ranges::any_of(cameras, [](const auto& status) { return status.lost_since_s > 0; });
     const auto source_options = is_one_down ? LiveSourceOptions(installation) : std::map<int, std::string>();
-    for (const RecordingStatus& status : cameras) {
+    for (const CameraStatus& status : cameras) {
         if (status.lost_since_s > 0) {
             findings.push_back(NoSignal(status, source_options));
         }

@@ -34,7 +34,7 @@ struct HostStatus {
 // Throws std::system_error.
 void WriteHostStatus(const base::Installation& installation, const std::vector<HostStatus>& hosts);
 
-// As ReadRecordingStatus: a recorder that has ended leaves its last report behind.
+// As ReadCameraStatus: a recorder that has ended leaves its last report behind.
 std::vector<HostStatus> ReadHostStatus(const base::Installation& installation);
 
 }  // namespace lookhaven::maintenance

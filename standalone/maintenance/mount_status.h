@@ -36,7 +36,7 @@ struct MountStatus {
 // Throws std::system_error.
 void WriteMountStatus(const base::Installation& installation, const std::vector<MountStatus>& mounts);
 
-// As ReadRecordingStatus: a recorder that has ended leaves its last report behind.
+// As ReadCameraStatus: a recorder that has ended leaves its last report behind.
 std::vector<MountStatus> ReadMountStatus(const base::Installation& installation);
 
 }  // namespace lookhaven::maintenance

@@ -49,7 +49,7 @@ class Catalog {
   public:
     // Starts the thread, which reads at once and calls on_change, from that thread, whenever it found something new.
     // Throws std::system_error when no thread can be started.
-    // host: as in LeaseKeeper; the mounts are its own and shared ones.
+    // host: as in RecorderLeaseKeeper; the mounts are its own and shared ones.
     Catalog(const std::string& store_url, int host, std::function<void()> on_change);
 
     // Has the store read again if its revision changed; does not wait.

@@ -5,7 +5,7 @@
 // Why so        No frame may be lost because the store is unavailable or hangs. So rows wait here, the newest state of
 //               each, and ids for future events are kept in reserve.
 // Invariants    (1) A row is stored only after its file exists: a caller puts a row when its file is on the disk.
-//               (2) No row is lost while the recorder runs. If it dies, maintenance/recovery.h finds the files.
+//               (2) No row is lost while the recorder runs. If it dies, maintenance/mount_recovery.h finds the files.
 // Thread safety Any thread; nothing here waits for the store.
 #pragma once
 
@@ -17,7 +17,7 @@
 #include <string>
 #include <vector>
 
-#include "standalone/recorder/lease_keeper.h"
+#include "standalone/recorder/recorder_lease_keeper.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -26,7 +26,7 @@ namespace lookhaven::recorder {
 
 class EventRowQueue {
   public:
-    // Starts the thread. recorder: names this recorder to others on the same store. host, times: as in LeaseKeeper.
+    // Starts the thread. recorder: names this recorder to others on the same store. host, times: as in RecorderLeaseKeeper.
     // Throws std::system_error when no thread can be started.
     explicit EventRowQueue(const std::string& store_url, const std::string& recorder = "this recorder", int host = 0,
                            LeaseTimes times = {});
@@ -88,7 +88,7 @@ class EventRowQueue {
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;
     std::atomic<std::int64_t> stored_us_;
-    LeaseKeeper lease_;               // only the thread uses it
+    RecorderLeaseKeeper lease_;       // only the thread uses it
     bool is_growth_refused_ = false;  // only the thread uses it
     std::atomic<bool> is_refused_ = false;
     std::atomic<bool> is_stopping_ = false;

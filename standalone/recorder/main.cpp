@@ -18,7 +18,7 @@
 #include "standalone/base/state_folder.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/recorder/instance_lock.h"
-#include "standalone/recorder/supervisor.h"
+#include "standalone/recorder/stream_supervisor.h"
 #include "standalone/ring/inventory.h"
 
 namespace {
@@ -43,7 +43,7 @@ void RunUntilStopped(const base::Installation& installation, std::chrono::millis
     const recorder::InstanceLock lock(installation);
     StopOnSignals();
     base::RaiseDescriptorLimit();  // each camera costs several
-    recorder::Supervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit, host_offline_limit);
+    recorder::StreamSupervisor supervisor(installation, pattern::AllSourceKinds(), no_data_limit, host_offline_limit);
     base::LogInfo("started for " + installation.Home().string());
     base::NotifyReady();
     while (g_stop == 0) {

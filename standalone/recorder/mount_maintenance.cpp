@@ -7,7 +7,7 @@
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/recovery.h"
+#include "standalone/maintenance/mount_recovery.h"
 #include "standalone/store/footage_removals.h"
 #include "standalone/store/kept_events.h"
 

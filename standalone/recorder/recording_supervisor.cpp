@@ -31,22 +31,22 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
     : installation_(installation),
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
-      cameras_(installation),
-      report_([&installation](const RecordingReport::States& states) {
-          maintenance::WriteRecordingStatus(installation, states.cameras);
+      camera_status_(installation),
+      status_publisher_([&installation](const StatusPublisher::States& states) {
+          maintenance::WriteCameraStatus(installation, states.cameras);
           maintenance::WriteMountStatus(installation, states.mounts);
       }),
       rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId(),
             TimesFor(host_offline_limit)),
-      hosts_(installation.HostId() == 0
-                 ? nullptr
-                 : std::make_unique<HostCameras>(installation, rows_,
-                                                 std::chrono::microseconds(host_offline_limit).count())),
+      camera_leases_(installation.HostId() == 0
+                         ? nullptr
+                         : std::make_unique<CameraLeaseKeeper>(installation, rows_,
+                                                               std::chrono::microseconds(host_offline_limit).count())),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(), [this](const store::Mark& mark) {
                             // A host that was cut off stores the rows of its footage when it is back.
-                            return (!hosts_ || base::WallSeconds() >= mark.end_s + kFootageElsewhereS) &&
+                            return (!camera_leases_ || base::WallSeconds() >= mark.end_s + kFootageElsewhereS) &&
                                    !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
                         });
                     }) {
@@ -78,7 +78,7 @@ std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogCont
 void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     const std::size_t cameras = entries_.size();
     const std::map<int, std::int64_t> marked = MarkedCameras(catalog);
-    const std::set<int> held = hosts_ ? hosts_->Held() : std::set<int>();
+    const std::set<int> held = camera_leases_ ? camera_leases_->Held() : std::set<int>();
     std::map<int, CameraPlan> plans;
     for (const auto& [camera, plan] : catalog.cameras) {
         plans.emplace(camera, PlanAt(plan, base::WallSeconds()));
@@ -86,7 +86,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     std::erase_if(entries_,
                   [](const auto& entry) { return entry.second.is_ending && entry.second.worker->HasEnded(); });
     const auto needs = [&](int camera, const CameraPlan& plan) {
-        return !rows_.IsRefused() && (hosts_ == nullptr || held.contains(camera)) &&
+        return !rows_.IsRefused() && (camera_leases_ == nullptr || held.contains(camera)) &&
                (plan.mode == store::RecordMode::kAlways || plan.pre_s > 0 || marked.contains(camera));
     };
     for (auto& [camera, entry] : entries_) {
@@ -115,11 +115,11 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         }
         entry->second.worker->SetRequest(request);
     }
-    if (hosts_) {
+    if (camera_leases_) {
         std::set<int> recorded;
         std::ranges::transform(entries_, std::inserter(recorded, recorded.end()),
                                [](const auto& entry) { return entry.first; });
-        hosts_->NoteRecorded(std::move(recorded));
+        camera_leases_->NoteRecorded(std::move(recorded));
     }
     if (entries_.size() > cameras) {
         rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its id
@@ -151,20 +151,20 @@ void RecordingSupervisor::AnswerFlushes() {
 
 void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
-    if (hosts_) {
-        hosts_->Ask(HasRoom());
+    if (camera_leases_) {
+        camera_leases_->Ask(HasRoom());
     }
     missed_marks_.Ask();
-    std::map<int, maintenance::RecordingStatus> recorded;
+    std::map<int, maintenance::CameraStatus> recorded;
     for (const auto& [camera, entry] : entries_) {
         recorded.emplace(camera, entry.worker->State());
     }
-    RecordingReport::States states{cameras_.Combine(std::move(recorded), signals), {}};
+    StatusPublisher::States states{camera_status_.Combine(std::move(recorded), signals), {}};
     for (const auto& [id, mount] : mounts_) {
         mount->Ask();
         states.mounts.push_back(mount->Status());
     }
-    report_.Publish(std::move(states));
+    status_publisher_.Publish(std::move(states));
 }
 
 std::vector<control::LiveStream> RecordingSupervisor::NeededStreams() const {
@@ -198,10 +198,10 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
 
 void RecordingSupervisor::RequestStop() {
     missed_marks_.RequestStop();
-    if (hosts_) {
-        hosts_->RequestStop();
+    if (camera_leases_) {
+        camera_leases_->RequestStop();
     }
-    report_.RequestStop();
+    status_publisher_.RequestStop();
     for (const auto& [id, mount] : mounts_) {
         mount->RequestStop();
     }
@@ -218,7 +218,8 @@ bool RecordingSupervisor::HasEnded() {
     if (!std::exchange(stores_last_rows_, true)) {
         rows_.RequestStop();
     }
-    return rows_.HasEnded() && (!hosts_ || hosts_->HasEnded()) && missed_marks_.HasEnded() && report_.HasEnded() &&
+    return rows_.HasEnded() && (!camera_leases_ || camera_leases_->HasEnded()) && missed_marks_.HasEnded() &&
+           status_publisher_.HasEnded() &&
            std::ranges::all_of(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
 }
 
@@ -261,7 +262,7 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
 }
 
 bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
-    return hosts_ && hosts_->IsHeldElsewhere(camera);
+    return camera_leases_ && camera_leases_->IsHeldElsewhere(camera);
 }
 
 bool RecordingSupervisor::HasRoom() const {

@@ -14,11 +14,11 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/control/stream_counters.h"
-#include "standalone/recorder/camera_states.h"
-#include "standalone/recorder/host_cameras.h"
+#include "standalone/recorder/camera_lease_keeper.h"
+#include "standalone/recorder/camera_status_tracker.h"
 #include "standalone/recorder/mount_maintenance.h"
-#include "standalone/recorder/recording_report.h"
 #include "standalone/recorder/recording_worker.h"
+#include "standalone/recorder/status_publisher.h"
 
 namespace lookhaven::recorder {
 
@@ -27,7 +27,7 @@ constexpr std::chrono::milliseconds kHostOfflineLimit{30'000};
 
 class RecordingSupervisor {
   public:
-    // host_offline_limit: as in Supervisor. The installation must outlive this object. Throws std::system_error.
+    // host_offline_limit: as in StreamSupervisor. The installation must outlive this object. Throws std::system_error.
     RecordingSupervisor(const base::Installation& installation, std::chrono::milliseconds no_data_limit,
                         std::chrono::milliseconds host_offline_limit = kHostOfflineLimit);
 
@@ -67,10 +67,10 @@ class RecordingSupervisor {
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
-    CameraStates cameras_;
-    RecordingReport report_;
+    CameraStatusTracker camera_status_;
+    StatusPublisher status_publisher_;
     EventRowQueue rows_;
-    std::unique_ptr<HostCameras> hosts_;  // null on a single machine
+    std::unique_ptr<CameraLeaseKeeper> camera_leases_;  // null on a single machine
     const std::int64_t started_s_ = base::WallSeconds();
     std::atomic<int> space_requests_ = 0;
     std::atomic<bool> are_mounts_recovered_ = false;

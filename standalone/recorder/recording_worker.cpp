@@ -37,7 +37,7 @@ void RecordingWorker::Flush(int event) {
     queue_->Wake();
 }
 
-maintenance::RecordingStatus RecordingWorker::State() const {
+maintenance::CameraStatus RecordingWorker::State() const {
     const std::lock_guard lock(mutex_);
     return {camera_, state_, open_event_, queue_->Dropped().frames, camera_name_};
 }
@@ -46,10 +46,10 @@ void RecordingWorker::Run(const std::stop_token& stop) {
     base::SetLogCamera(camera_);
     {
         const std::stop_callback wake(stop, [this] { queue_->Wake(); });
-        CameraRecorder recording(camera_, context_);
-        Record(recording, stop);
+        EventSegmenter segmenter(camera_, context_);
+        Record(segmenter, stop);
         while (std::optional<Frame> frame = queue_->Pop(0)) {
-            recording.Take(std::move(*frame));
+            segmenter.Take(std::move(*frame));
         }
     }
     context_.rows.NoteEnded(camera_);
@@ -57,42 +57,42 @@ void RecordingWorker::Run(const std::stop_token& stop) {
     has_ended_ = true;
 }
 
-void RecordingWorker::Record(CameraRecorder& recording, const std::stop_token& stop) {
+void RecordingWorker::Record(EventSegmenter& segmenter, const std::stop_token& stop) {
     while (!stop.stop_requested()) {
         const std::int64_t now_us = base::MonotonicMicros();
         std::optional<Frame> frame = queue_->Pop(asked_flush_ != 0 ? now_us : now_us + kTickUs);
         {
             const std::lock_guard lock(mutex_);
             if (new_request_) {
-                recording.SetRequest(*std::exchange(new_request_, std::nullopt));
+                segmenter.SetRequest(*std::exchange(new_request_, std::nullopt));
             }
         }
         // Frames come in the order of capture.
         const std::int64_t taken_us = frame ? std::min(frame->timestamp_us, now_us) : now_us;
         if (frame) {
-            recording.Take(std::move(*frame));
+            segmenter.Take(std::move(*frame));
         }
-        recording.Tick();
+        segmenter.Tick();
         written_us_ = taken_us;
         const std::int64_t age_ms = (base::MonotonicMicros() - taken_us) / 1000;
         context_.rows.NoteWritten(camera_, (context_.wall_ms() - age_ms) / 1000);
-        Publish(recording);
+        Publish(segmenter);
         if (!frame) {
-            AnswerFlush(recording);
+            AnswerFlush(segmenter);
         }
     }
 }
 
 // Only once the queue is empty, so that every frame that arrived is included.
-void RecordingWorker::AnswerFlush(CameraRecorder& recording) {
+void RecordingWorker::AnswerFlush(EventSegmenter& segmenter) {
     if (const int event = asked_flush_.exchange(0); event != 0) {
-        flush_requests_.Answer(event, recording.Flush(event));
+        flush_requests_.Answer(event, segmenter.Flush(event));
     }
 }
 
-void RecordingWorker::Publish(const CameraRecorder& recording) {
-    state_ = recording.State();
-    open_event_ = recording.OpenEvent();
+void RecordingWorker::Publish(const EventSegmenter& segmenter) {
+    state_ = segmenter.State();
+    open_event_ = segmenter.OpenEvent();
     const FrameQueue::Drops drops = queue_->Dropped();
     if (drops.is_dropping && !std::exchange(drops_reported_, true)) {
         base::LogWarning("camera " + std::to_string(camera_) + ": disk too slow, dropping frames");

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The thread that records one camera.
+// The thread that records one camera: hands its frames to the EventSegmenter, and answers requests to flush.
 #pragma once
 
 #include <atomic>
@@ -12,7 +12,7 @@
 #include <thread>
 
 #include "standalone/control/flush_request.h"
-#include "standalone/recorder/camera_recorder.h"
+#include "standalone/recorder/event_segmenter.h"
 #include "standalone/recorder/frame_queue.h"
 
 namespace lookhaven::recorder {
@@ -34,7 +34,7 @@ class RecordingWorker {
 
     int OpenEvent() const { return open_event_; }
     // As the thread last published it, at most a quarter of a second old.
-    maintenance::RecordingStatus State() const;
+    maintenance::CameraStatus State() const;
 
     // Monotonic: all frames that had arrived by then are written or given up. Lags by half a second at most, and more
     // while the disk is slow.
@@ -47,9 +47,9 @@ class RecordingWorker {
 
   private:
     void Run(const std::stop_token& stop);
-    void Record(CameraRecorder& recording, const std::stop_token& stop);
-    void AnswerFlush(CameraRecorder& recording);
-    void Publish(const CameraRecorder& recording);
+    void Record(EventSegmenter& segmenter, const std::stop_token& stop);
+    void AnswerFlush(EventSegmenter& segmenter);
+    void Publish(const EventSegmenter& segmenter);
 
     const int camera_;
     const RecorderContext context_;

@@ -6,7 +6,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/control/common_config.h"
 #include "standalone/control/stream_counters.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/cameras.h"
 #include "test/support/host/host_under_test.h"
 
@@ -79,7 +79,7 @@ TEST(CameraApi, TellsWhetherPicturesComeSinceWhenNotAndWhyNot) {
         {RecordingState::kDiskFull, kRefused, true, true, false, "no-signal refused disk-full"},
         {RecordingState::kReady, {}, false, false, false, "disabled  ready"},
     };
-    std::vector<maintenance::RecordingStatus> states;
+    std::vector<maintenance::CameraStatus> states;
     std::vector<control::StreamCounters> streams;
     for (const auto& row : rows) {
         store::Camera camera;
@@ -97,7 +97,7 @@ TEST(CameraApi, TellsWhetherPicturesComeSinceWhenNotAndWhyNot) {
                 {.stream = {id, 0}, .pictures = row.has_picture ? 9U : 0U, .last_picture_us = base::MonotonicMicros()});
         }
     }
-    maintenance::WriteRecordingStatus(host.Home(), states);
+    maintenance::WriteCameraStatus(host.Home(), states);
     control::StreamCountersWriter(host.Home()).Write(streams);
     for (const bool is_alive : {false, true}) {
         if (is_alive) {

@@ -2,7 +2,7 @@
 //
 // VEXO.Catalog: states of cameras, groups, mounts and rights, as far as the caller may see them.
 #include "standalone/control/common_config.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/groups.h"
 #include "standalone/store/mounts.h"
 #include "test/component/api/event_fixture.h"
@@ -14,13 +14,13 @@ class CatalogApi : public EventApi {};
 
 TEST_F(CatalogApi, TellsWhichCamerasAreDownToThoseWhoMayWatchThem) {
     const std::string ask = "Catalog&version=1&method=CameraStates";
-    maintenance::RecordingStatus down{.camera = 1, .state = maintenance::RecordingState::kNoSignal};
+    maintenance::CameraStatus down{.camera = 1, .state = maintenance::RecordingState::kNoSignal};
     down.lost_since_s = 1'772'352'930;
     down.loss = base::SignalLoss::kRefused;
     down.loss_reason = "cannot open rtsp://192.0.2.1/";
-    maintenance::RecordingStatus denied = down;
+    maintenance::CameraStatus denied = down;
     denied.camera = 2;
-    maintenance::WriteRecordingStatus(host_.Home(), {down, denied, {.camera = 3}});
+    maintenance::WriteCameraStatus(host_.Home(), {down, denied, {.camera = 3}});
     EXPECT_EQ(Ask(ask).Json()["data"]["recorder"], false) << "stale";
     EXPECT_TRUE(Ask(ask).Json()["data"]["camera"].empty());
     control::CommonConfigKeeper(host_.Home()).Refresh(false);

@@ -3,7 +3,7 @@
 // lookhaven camera: what each line answers, and what it stores.
 #include "standalone/base/installation.h"
 #include "standalone/control/common_config.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/cameras.h"
 #include "test/component/cli/program.h"
 
@@ -89,10 +89,10 @@ TEST_F(DemoTest, ACameraIsListedWithWhetherItsPicturesComeOrSinceWhenAndWhyNot) 
     using enum base::SignalLoss;
     using maintenance::RecordingState;
     const auto lost = [](int camera, RecordingState state, base::SignalLoss loss) {
-        return maintenance::RecordingStatus{.camera = camera, .state = state, .lost_since_s = kMarch, .loss = loss};
+        return maintenance::CameraStatus{.camera = camera, .state = state, .lost_since_s = kMarch, .loss = loss};
     };
     const struct {
-        maintenance::RecordingStatus status;
+        maintenance::CameraStatus status;
         const char *has, *has_not;
     } rows[] = {
         {{.camera = 1, .state = RecordingState::kRecording}, "Entrance   recording ", "since"},
@@ -107,7 +107,7 @@ TEST_F(DemoTest, ACameraIsListedWithWhetherItsPicturesComeOrSinceWhenAndWhyNot) 
     };
     const base::Installation installation(home_);
     for (const auto& row : rows) {
-        maintenance::WriteRecordingStatus(installation, {row.status});
+        maintenance::WriteCameraStatus(installation, {row.status});
         control::CommonConfigKeeper(installation).Refresh(false);
         Play({{"camera list", 0, row.has, row.has_not}});
     }

@@ -81,8 +81,8 @@ std::function<void()> DoctorTest::Shell(const std::string& command) {
     return [command] { EXPECT_EQ(std::system(command.c_str()), 0) << command; };
 }
 
-std::function<void()> DoctorTest::WriteStatus(const std::vector<maintenance::RecordingStatus>& cameras) {
-    return [this, cameras] { maintenance::WriteRecordingStatus(base::Installation(home_), cameras); };
+std::function<void()> DoctorTest::WriteStatus(const std::vector<maintenance::CameraStatus>& cameras) {
+    return [this, cameras] { maintenance::WriteCameraStatus(base::Installation(home_), cameras); };
 }
 
 std::function<void()> DoctorTest::MakeCertificate(int days) {

@@ -12,7 +12,7 @@
 
 #include <unistd.h>
 
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "test/component/cli/fake_host.h"
 #include "test/component/cli/program.h"
 
@@ -43,7 +43,7 @@ class DoctorTest : public cli::DemoTest {
     // Causes and mends of faults.
     std::function<void()> Sql(const std::string& statement);
     static std::function<void()> Shell(const std::string& command);
-    std::function<void()> WriteStatus(const std::vector<maintenance::RecordingStatus>& cameras);
+    std::function<void()> WriteStatus(const std::vector<maintenance::CameraStatus>& cameras);
     std::function<void()> MakeCertificate(int days);
 
     // The owner of the installation: what this process makes is then as the server's.

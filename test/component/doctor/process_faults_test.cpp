@@ -28,12 +28,12 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
     int port = 0;
     base::FileDescriptor web_port = cli::BindPort(port);
     std::unique_ptr<cli::FakeHost> web;
-    const maintenance::RecordingStatus refuses{.camera = 1,
-                                               .state = maintenance::RecordingState::kNoSignal,
-                                               .camera_name = "Entrance",
-                                               .lost_since_s = 1,
-                                               .loss = base::SignalLoss::kWrongPassword,
-                                               .loss_reason = "cannot open: 401"};
+    const maintenance::CameraStatus refuses{.camera = 1,
+                                            .state = maintenance::RecordingState::kNoSignal,
+                                            .camera_name = "Entrance",
+                                            .lost_since_s = 1,
+                                            .loss = base::SignalLoss::kWrongPassword,
+                                            .loss_reason = "cannot open: 401"};
     auto refused = refuses, untrusted = refuses, mount_gone = refuses, no_id = refuses;
     refused.loss = base::SignalLoss::kRefused;
     untrusted.loss = base::SignalLoss::kCertificate;

@@ -5,7 +5,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/base/process.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/store/cameras.h"
 #include "test/component/recorder/recorder_fixture.h"
 #include "test/support/camera/mjpeg_camera.h"
@@ -107,15 +107,15 @@ TEST_F(RecorderTest, BadCamerasLeaveTheOthersAlone) {
     }
     Child recorder = StartRecorder();
     const auto status_of = [&](int camera) {
-        const auto all = maintenance::ReadRecordingStatus(*installation_);
-        const auto found = std::ranges::find(all, camera, &maintenance::RecordingStatus::camera);
-        return found == all.end() ? maintenance::RecordingStatus() : *found;
+        const auto all = maintenance::ReadCameraStatus(*installation_);
+        const auto found = std::ranges::find(all, camera, &maintenance::CameraStatus::camera);
+        return found == all.end() ? maintenance::CameraStatus() : *found;
     };
     for (const auto& row : bad) {
         SCOPED_TRACE(row.source);
         EXPECT_TRUE(Eventually([&] { return good.HasPicture() && LogLines(row.message) > 0; })) << row.message;
         EXPECT_TRUE(Eventually([&] {
-            const maintenance::RecordingStatus status = status_of(row.camera);
+            const maintenance::CameraStatus status = status_of(row.camera);
             return status.state == maintenance::RecordingState::kNoSignal && status.loss == row.loss &&
                    status.lost_since_s > 0 && status.loss_reason.find(row.message) != std::string::npos;
         })) << "the owner is not told";

@@ -135,7 +135,7 @@ TEST_F(RecordingSupervisorTest, AThreadThatCannotBeHadIsTriedAgainAndCostsNoOthe
     EXPECT_TRUE(test::Eventually([&] {
         supervisor.DoEverySecond({{2, refused}});
         std::string states;
-        for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation_)) {
+        for (const maintenance::CameraStatus& status : maintenance::ReadCameraStatus(installation_)) {
             states += NameOf(status.state) + std::string(status.lost_since_s > 0 ? " since " : " ");
         }
         return states == "ready no-signal since ready ";

@@ -18,8 +18,8 @@
 #include "standalone/archive/recording_reader.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/file.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/recording_status.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
@@ -208,7 +208,7 @@ TEST_P(RecordingTest, AFullDiskPausesRecordingAloneUntilThereIsRoom) {
     SetPlan(camera, store::RecordMode::kAlways);
     const Child recorder = StartRecorder();
     const auto is_in = [&](maintenance::RecordingState state) {
-        const auto states = maintenance::ReadRecordingStatus(*installation_);
+        const auto states = maintenance::ReadCameraStatus(*installation_);
         return states.size() == 1 && states.front().state == state;
     };
     Viewer viewer(*installation_, camera);

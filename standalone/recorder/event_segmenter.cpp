@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/camera_recorder.h"
+#include "standalone/recorder/event_segmenter.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -39,9 +39,9 @@ bool IsFull(const std::exception& failure) {
 
 }  // namespace
 
-CameraRecorder::CameraRecorder(int camera, RecorderContext context) : camera_(camera), context_(std::move(context)) {}
+EventSegmenter::EventSegmenter(int camera, RecorderContext context) : camera_(camera), context_(std::move(context)) {}
 
-CameraRecorder::~CameraRecorder() {
+EventSegmenter::~EventSegmenter() {
     Close();
     finish_again_us_ = 0;
     FinishPending();
@@ -50,7 +50,7 @@ CameraRecorder::~CameraRecorder() {
     }
 }
 
-void CameraRecorder::Take(Frame frame) {
+void EventSegmenter::Take(Frame frame) {
     const std::int64_t interval_us = IntervalAfter(frame);
     if (frame.medium == base::Medium::kVideo) {
         last_picture_us_ = context_.monotonic_us();
@@ -69,7 +69,7 @@ void CameraRecorder::Take(Frame frame) {
     interval_us_ = interval_us;
 }
 
-std::int64_t CameraRecorder::IntervalAfter(const Frame& frame) {
+std::int64_t EventSegmenter::IntervalAfter(const Frame& frame) {
     if (frame.medium != base::Medium::kVideo) {
         return interval_us_;
     }
@@ -79,7 +79,7 @@ std::int64_t CameraRecorder::IntervalAfter(const Frame& frame) {
     return interval_us_ + (interval_us - interval_us_) / 4;
 }
 
-void CameraRecorder::Tick() {
+void EventSegmenter::Tick() {
     const std::int64_t now_us = context_.monotonic_us();
     if (event_ && (!IsWanted() || now_us - last_picture_us_ > context_.no_data_limit_us)) {
         Close();
@@ -100,7 +100,7 @@ void CameraRecorder::Tick() {
 }
 
 // A disk that was full, unmounted or read-only for a moment must not leave files that look as if a crash had.
-void CameraRecorder::FinishPending() {
+void EventSegmenter::FinishPending() {
     const std::int64_t now_us = context_.monotonic_us();
     if (unfinished_.empty() || now_us < finish_again_us_) {
         return;
@@ -119,43 +119,43 @@ void CameraRecorder::FinishPending() {
     }
 }
 
-void CameraRecorder::GiveUp(std::vector<Unfinished>::iterator left) {
+void EventSegmenter::GiveUp(std::vector<Unfinished>::iterator left) {
     base::LogWarning("event " + std::to_string(left->event->Start().id) + " of camera " + std::to_string(camera_) +
                      " could not be finished: lookhaven verify --repair does it when the disk is well again");
     left->event->FinishRow();
     unfinished_.erase(left);
 }
 
-bool CameraRecorder::Flush(int event) {
+bool EventSegmenter::Flush(int event) {
     return event_ && OpenEvent() == event && Guard([&] { event_->Flush(); });
 }
 
-void CameraRecorder::Close() {
+void EventSegmenter::Close() {
     if (event_ && Guard([&] { event_->Close(); })) {
         event_.reset();
         state_ = RecordingState::kReady;
     }
 }
 
-std::int64_t CameraRecorder::WallOf(std::int64_t timestamp_us) const {
+std::int64_t EventSegmenter::WallOf(std::int64_t timestamp_us) const {
     return context_.wall_ms() - (context_.monotonic_us() - timestamp_us) / 1000;
 }
 
-bool CameraRecorder::IsWanted() const {
+bool EventSegmenter::IsWanted() const {
     return request_.plan.mode == store::RecordMode::kAlways || WallS() < request_.marks_until_s;
 }
 
-int CameraRecorder::Reason() const {
+int EventSegmenter::Reason() const {
     return request_.plan.mode == store::RecordMode::kAlways ? base::kReasonContinuous : base::kReasonAlarm;
 }
 
 // A gap of more than a few seconds, unless the camera always sends so few pictures.
-bool CameraRecorder::IsAfterGap(const Frame& frame) const {
+bool EventSegmenter::IsAfterGap(const Frame& frame) const {
     return frame.medium == base::Medium::kVideo &&
            frame.timestamp_us - newest_us_ > std::max(kMaxGapUs, 3 * interval_us_);
 }
 
-void CameraRecorder::Write(const Frame& frame) {
+void EventSegmenter::Write(const Frame& frame) {
     if (frame.medium == base::Medium::kVideo) {
         event_->Write(frame, IsAfterGap(frame));
         newest_us_ = std::max(newest_us_, frame.timestamp_us);
@@ -164,7 +164,7 @@ void CameraRecorder::Write(const Frame& frame) {
     }
 }
 
-bool CameraRecorder::MustEndBefore(const Frame& frame) {
+bool EventSegmenter::MustEndBefore(const Frame& frame) {
     const EventStart& start = event_->Start();
     const std::int64_t length_us = frame.timestamp_us - start.timestamp_us;
     if (!event_->Takes(frame) || length_us >= kMaxEventUs) {
@@ -183,7 +183,7 @@ bool CameraRecorder::MustEndBefore(const Frame& frame) {
 }
 
 // A camera decides its own times, and each event costs what cameras share: a file, a row, an id.
-bool CameraRecorder::MayCutByTimes() {
+bool EventSegmenter::MayCutByTimes() {
     const std::int64_t now_us = context_.monotonic_us();
     cuts_accounted_until_us_ = std::max(cuts_accounted_until_us_, now_us - kMaxCutBurst * kCutIntervalUs);
     if (cuts_accounted_until_us_ + kCutIntervalUs > now_us) {
@@ -194,11 +194,11 @@ bool CameraRecorder::MayCutByTimes() {
 }
 
 // As long as the store has assigned no id for the next event, this one continues.
-bool CameraRecorder::IsOverdue(std::int64_t length_us) const {
+bool EventSegmenter::IsOverdue(std::int64_t length_us) const {
     return length_us >= std::int64_t{request_.plan.segment_s} * 1'000'000 && context_.rows.HasId();
 }
 
-void CameraRecorder::Begin() {
+void EventSegmenter::Begin() {
     if (!IsWanted()) {
         state_ = RecordingState::kReady;
         return;
@@ -226,7 +226,7 @@ void CameraRecorder::Begin() {
 }
 
 // Nothing, and a state that says why, when no event can begin now.
-std::optional<EventStart> CameraRecorder::Prepare(std::int64_t first_us) {
+std::optional<EventStart> EventSegmenter::Prepare(std::int64_t first_us) {
     if (request_.plan.mount_id == 0) {
         Pause(RecordingState::kNoMount, "there is no storage mount");
         return std::nullopt;
@@ -244,7 +244,7 @@ std::optional<EventStart> CameraRecorder::Prepare(std::int64_t first_us) {
 }
 
 // An event may use half of the reserve before it ends, so that a full disk does not make many short ones.
-void CameraRecorder::CheckMount() {
+void EventSegmenter::CheckMount() {
     const std::filesystem::path path = event_ ? event_->Start().mount : request_.plan.mount;
     const int id = event_ ? event_->Start().mount_id : request_.plan.mount_id;
     Guard([&] {
@@ -263,7 +263,7 @@ void CameraRecorder::CheckMount() {
 
 // False when the work threw; recording is paused then.
 template <class Work>
-bool CameraRecorder::Guard(Work&& work) {
+bool EventSegmenter::Guard(Work&& work) {
     try {
         work();
         return true;
@@ -273,7 +273,7 @@ bool CameraRecorder::Guard(Work&& work) {
     }
 }
 
-void CameraRecorder::Pause(RecordingState state, const std::string& reason) {
+void EventSegmenter::Pause(RecordingState state, const std::string& reason) {
     if (event_) {
         try {
             event_->Close();

@@ -2,8 +2,8 @@
 //
 // Hands the states of cameras and mounts to what writes them to files for the operator, in a thread of its own.
 //
-// Why so        A slow disk must not hold up the supervisor, which tells viewers every second that the recorder is
-//               alive.
+// Why so        A slow disk must not hold up the StreamSupervisor, which tells viewers every second that the recorder
+//               is alive.
 // Thread safety Any thread.
 #pragma once
 
@@ -15,15 +15,15 @@
 #include <thread>
 #include <vector>
 
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/maintenance/mount_status.h"
-#include "standalone/maintenance/recording_status.h"
 
 namespace lookhaven::recorder {
 
-class RecordingReport {
+class StatusPublisher {
   public:
     struct States {
-        std::vector<maintenance::RecordingStatus> cameras;
+        std::vector<maintenance::CameraStatus> cameras;
         std::vector<maintenance::MountStatus> mounts;
 
         bool operator==(const States&) const = default;
@@ -31,7 +31,7 @@ class RecordingReport {
 
     // Starts the thread, which takes no signals and calls write. What write throws is logged, and it is called again
     // for the next states. Throws std::system_error when no thread can be started.
-    explicit RecordingReport(std::function<void(const States&)> write);
+    explicit StatusPublisher(std::function<void(const States&)> write);
 
     // Has the thread write the states where they differ from the last; does not wait.
     void Publish(States states);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What a recorder's start makes of the files of one that was killed, where one of them is damaged or the disk fails.
-#include "standalone/maintenance/recovery.h"
+#include "standalone/maintenance/mount_recovery.h"
 
 #include <array>
 #include <memory>

@@ -2,7 +2,7 @@
 //
 // Where one camera's events begin and end, on clocks that the test holds: nothing is lost between two of them, whatever
 // ends the first.
-#include "standalone/recorder/camera_recorder.h"
+#include "standalone/recorder/event_segmenter.h"
 
 #include <cmath>
 
@@ -26,15 +26,15 @@ using maintenance::RecordingState;
 constexpr std::int64_t kNoonMs = 1'772'366'400'000;
 constexpr int kFps = 25;
 
-class CameraRecorderTest : public testing::Test {
+class EventSegmenterTest : public testing::Test {
   protected:
-    CameraRecorderTest() {
+    EventSegmenterTest() {
         for (const int mount : {1, 2}) {
             fs::create_directory(MountPath(mount));
             maintenance::MountFolder::WriteMarker(MountPath(mount), {mount, "here"});
         }
         request_.plan = {"Camera", store::RecordMode::kAlways, 60, 0, 0, 1, MountPath(1), "here"};
-        recorder_.SetRequest(request_);
+        segmenter_.SetRequest(request_);
         Send(test::kH264);  // a key frame each second
     }
 
@@ -46,7 +46,7 @@ class CameraRecorderTest : public testing::Test {
     fs::path MountPath(int mount) const { return folder_ / std::to_string(mount); }
     std::string StoreUrl() const { return "sqlite:" + (folder_ / "store.db").string(); }
 
-    // Until the recorder has numbers for events.
+    // Until there are ids for events.
     void OpenStore() {
         store::Store::Migrate(StoreUrl());
         ASSERT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return rows_.Refresh(4), rows_.HasId(); }));
@@ -58,9 +58,9 @@ class CameraRecorderTest : public testing::Test {
             if (with_pictures) {
                 const test::OwnedPacket& packet = clip_->packets[fed_++ % clip_->packets.size()];
                 taken_late_us_ = packet.key_frame ? late_us_ : taken_late_us_;
-                recorder_.Take({format_, packet.medium, packet.data, now_us_ - taken_late_us_, packet.key_frame});
+                segmenter_.Take({format_, packet.medium, packet.data, now_us_ - taken_late_us_, packet.key_frame});
             }
-            recorder_.Tick();
+            segmenter_.Tick();
         }
     }
 
@@ -83,43 +83,43 @@ class CameraRecorderTest : public testing::Test {
     std::int64_t wall_ahead_ms_ = kNoonMs;  // of the monotonic clock
     std::int64_t late_us_ = 0;              // of the pictures from the next key frame on
     std::int64_t taken_late_us_ = 0;
-    int rooms_wanted_ = 0;
+    int space_requests_ = 0;
     std::size_t fed_ = 0;
     EventRowQueue rows_{StoreUrl()};
     RecordingRequest request_;
-    CameraRecorder recorder_{7,
-                             {rows_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
-                              [this] { ++rooms_wanted_; }, 10'000'000}};
+    EventSegmenter segmenter_{7,
+                              {rows_, [this] { return now_us_; }, [this] { return wall_ahead_ms_ + now_us_ / 1000; },
+                               [this] { ++space_requests_; }, 10'000'000}};
     const test::Clip* clip_ = nullptr;
     std::shared_ptr<const media::MediaFormat> format_;
 };
 
-TEST_F(CameraRecorderTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsEndAlone) {
+TEST_F(EventSegmenterTest, ADiskThatLeavesInTheMomentAnEventEndsCostsThatEventsEndAlone) {
     OpenStore();
     Pass(2.48);
     fs::rename(MountPath(1), folder_ / "away");
-    recorder_.Close();
-    EXPECT_EQ(recorder_.OpenEvent(), 0);
-    EXPECT_EQ(recorder_.State(), RecordingState::kDiskFails);
+    segmenter_.Close();
+    EXPECT_EQ(segmenter_.OpenEvent(), 0);
+    EXPECT_EQ(segmenter_.State(), RecordingState::kDiskFails);
     fs::rename(folder_ / "away", MountPath(1));
     Pass(3);
-    recorder_.Close();
+    segmenter_.Close();
     ASSERT_EQ(Files().size(), 2U);
     EXPECT_GE(archive::RecordingReader(Files().front()).FrameCount(), 60) << "it was on the disk";
     std::array<std::uint8_t, 6> seconds{};
     ASSERT_TRUE(archive::ReadRecordingLog(MountPath(1) / "7", (kNoonMs + 1'000'000) / 1000, seconds));
     EXPECT_THAT(seconds, testing::Each(base::kReasonContinuous)) << "what the disk refused is written later";
-    EXPECT_EQ(recorder_.State(), RecordingState::kReady);
+    EXPECT_EQ(segmenter_.State(), RecordingState::kReady);
 }
 
 // Else retention would leave it alone for ever, and a full disk full.
-TEST_F(CameraRecorderTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinute) {
+TEST_F(EventSegmenterTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinute) {
     OpenStore();
     Pass(2.48);
-    const int event = recorder_.OpenEvent();
-    ASSERT_TRUE(recorder_.Flush(event));
+    const int event = segmenter_.OpenEvent();
+    ASSERT_TRUE(segmenter_.Flush(event));
     test::g_failing_syncs = std::numeric_limits<int>::max();
-    recorder_.Close();
+    segmenter_.Close();
     const auto is_open_in_store = [&] {
         rows_.Refresh(4);
         store::Store store = store::Store::Open(StoreUrl());
@@ -133,11 +133,11 @@ TEST_F(CameraRecorderTest, AnEventThatTheDiskDoesNotLetFinishIsGivenUpAfterAMinu
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(5), [&] { return !is_open_in_store(); }));
     test::g_failing_syncs = 0;
     Pass(3);
-    EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
-    EXPECT_NE(recorder_.OpenEvent(), event);
+    EXPECT_EQ(segmenter_.State(), RecordingState::kRecording);
+    EXPECT_NE(segmenter_.OpenEvent(), event);
 }
 
-TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
+TEST_F(EventSegmenterTest, EventsEndWithoutLosingAFrameBetweenThem) {
     OpenStore();
     struct Row {
         const char* what;
@@ -166,11 +166,11 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
         Send(row.video);
         Pass(2.48);
         row.happens();
-        recorder_.SetRequest(request_);
+        segmenter_.SetRequest(request_);
         Pass(7.52);
-        recorder_.Close();
+        segmenter_.Close();
         late_us_ = 0;
-        EXPECT_EQ(recorder_.State(), RecordingState::kReady);
+        EXPECT_EQ(segmenter_.State(), RecordingState::kReady);
         const std::vector<fs::path> files = Files();
         ASSERT_EQ(files.size() - known, row.seconds.size());
         std::int64_t expected_ms = begin_ms;
@@ -195,40 +195,40 @@ TEST_F(CameraRecorderTest, EventsEndWithoutLosingAFrameBetweenThem) {
             EXPECT_THAT(log, testing::ElementsAre(1, 1, 1, 0, 0, 0, 1, 1, 1, 1, 1, 1, 1, 1));
         }
         request_.plan.segment_s = 60;
-        recorder_.SetRequest(request_);
+        segmenter_.SetRequest(request_);
         OpenStore();  // more numbers
     }
 }
 
-TEST_F(CameraRecorderTest, AnEventGoesOnWhileThereIsNoIdForTheNext) {
+TEST_F(EventSegmenterTest, AnEventGoesOnWhileThereIsNoIdForTheNext) {
     OpenStore();
     rows_.Refresh(0);  // fetches no more
     request_.plan.segment_s = 2;
-    recorder_.SetRequest(request_);
+    segmenter_.SetRequest(request_);
     Pass(1);
-    const int event = recorder_.OpenEvent();
+    const int event = segmenter_.OpenEvent();
     while (rows_.TakeId()) {
     }
     for (const bool camera_stalls : {false, true}) {
         Pass(4, !camera_stalls);
         Pass(4);
-        EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
-        EXPECT_EQ(recorder_.OpenEvent(), event) << camera_stalls;
+        EXPECT_EQ(segmenter_.State(), RecordingState::kRecording);
+        EXPECT_EQ(segmenter_.OpenEvent(), event) << camera_stalls;
     }
     OpenStore();
     Pass(2);
-    EXPECT_GT(recorder_.OpenEvent(), event);
+    EXPECT_GT(segmenter_.OpenEvent(), event);
 }
 
-TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
+TEST_F(EventSegmenterTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     Pass(2);
-    EXPECT_EQ(recorder_.State(), RecordingState::kNoEventId) << "the store has not been there yet";
+    EXPECT_EQ(segmenter_.State(), RecordingState::kNoEventId) << "the store has not been there yet";
     OpenStore();
     const auto is_recorded_again = [&] {
         fed_ = 0;
         Pass(3);
-        EXPECT_EQ(recorder_.State(), RecordingState::kRecording);
-        EXPECT_GT(recorder_.OpenEvent(), 0);
+        EXPECT_EQ(segmenter_.State(), RecordingState::kRecording);
+        EXPECT_GT(segmenter_.OpenEvent(), 0);
         OpenStore();
     };
     is_recorded_again();
@@ -256,32 +256,32 @@ TEST_F(CameraRecorderTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     for (const Row& row : rows) {
         SCOPED_TRACE(NameOf(row.state));
         row.happens();
-        recorder_.SetRequest(request_);
+        segmenter_.SetRequest(request_);
         Pass(row.with_pictures ? 3 : 11, row.with_pictures);
-        EXPECT_EQ(recorder_.State(), row.state);
-        EXPECT_EQ(recorder_.OpenEvent(), 0);
+        EXPECT_EQ(segmenter_.State(), row.state);
+        EXPECT_EQ(segmenter_.OpenEvent(), 0);
         row.ends();
-        recorder_.SetRequest(request_);
+        segmenter_.SetRequest(request_);
         is_recorded_again();
     }
-    EXPECT_EQ(rooms_wanted_, 0);
-    recorder_.Close();
+    EXPECT_EQ(space_requests_, 0);
+    segmenter_.Close();
     for (const fs::path& file : Files()) {
         EXPECT_FALSE(archive::RecordingReader(file).Grows()) << file;
         EXPECT_THAT(test::Probe(file), testing::MatchesRegex("h264,[0-9]+\n"));
     }
 }
 
-TEST_F(CameraRecorderTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
+TEST_F(EventSegmenterTest, AnAlarmGetsTheSecondsBeforeItAndEndsInTime) {
     OpenStore();
     request_.plan.mode = store::RecordMode::kNever;
     request_.plan.pre_s = 2;
-    recorder_.SetRequest(request_);
+    segmenter_.SetRequest(request_);
     Pass(4.6);
     EXPECT_TRUE(Files().empty());
     const std::int64_t alarm_s = (wall_ahead_ms_ + now_us_ / 1000) / 1000 - 1;  // known a second later
     request_.marks_until_s = alarm_s + 3;
-    recorder_.SetRequest(request_);
+    segmenter_.SetRequest(request_);
     Pass(10);
     ASSERT_EQ(Files().size(), 1U);
     const archive::RecordingReader event(Files().front());

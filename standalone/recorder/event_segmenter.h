@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Decides for one camera what is recorded: where an event begins, where it is split, when recording pauses.
+// Splits the frames of one camera into events: where each begins and ends, and when recording pauses.
 //
 // Invariants    (1) Every event begins with a key frame and is split before one. Only the end of the request, a lost
 //               camera and a failing disk end it elsewhere.
@@ -19,7 +19,7 @@
 #include <string>
 #include <vector>
 
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/event_writer.h"
 #include "standalone/recorder/pre_record_buffer.h"
@@ -29,7 +29,7 @@ namespace lookhaven::recorder {
 constexpr std::int64_t kClockStepMs = 2'000;
 constexpr std::int64_t kMaxGapUs = 3'000'000;
 
-// What the recorders of all cameras share. Borrowed: everything in it outlives them.
+// What the recording of all cameras shares. Borrowed: everything in it outlives them.
 struct RecorderContext {
     EventRowQueue& rows;
     std::function<std::int64_t()> monotonic_us;
@@ -44,11 +44,11 @@ struct RecordingRequest {
     std::int64_t marks_until_s = 0;  // wall clock; a mark needs footage until then
 };
 
-class CameraRecorder {
+class EventSegmenter {
   public:
-    CameraRecorder(int camera, RecorderContext context);
+    EventSegmenter(int camera, RecorderContext context);
     // Closes the open event.
-    ~CameraRecorder();
+    ~EventSegmenter();
 
     void SetRequest(const RecordingRequest& request) { request_ = request; }
 

@@ -35,7 +35,7 @@ enum class RecordingState {
 // "ready", "recording", "disk-full", "disk-fails", "mount-gone", "no-mount", "no-event-id", "no-signal"
 const char* NameOf(RecordingState state);
 
-struct RecordingStatus {
+struct CameraStatus {
     int camera = 0;
     RecordingState state = RecordingState::kReady;
     int event = 0;                     // being recorded, else 0
@@ -45,14 +45,14 @@ struct RecordingStatus {
     base::SignalLoss loss = base::SignalLoss::kOther;
     std::string loss_reason = {};  // one sentence without credentials
 
-    bool operator==(const RecordingStatus&) const = default;
+    bool operator==(const CameraStatus&) const = default;
 };
 
 // Throws std::system_error.
-void WriteRecordingStatus(const base::Installation& installation, const std::vector<RecordingStatus>& cameras);
+void WriteCameraStatus(const base::Installation& installation, const std::vector<CameraStatus>& cameras);
 
 // Empty when no recorder has run yet. A recorder that has ended leaves its last report behind: check
 // control::IsRecorderAlive too.
-std::vector<RecordingStatus> ReadRecordingStatus(const base::Installation& installation);
+std::vector<CameraStatus> ReadCameraStatus(const base::Installation& installation);
 
 }  // namespace lookhaven::maintenance

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/recording_report.h"
+#include "standalone/recorder/status_publisher.h"
 
 #include <exception>
 #include <utility>
@@ -9,18 +9,18 @@
 
 namespace lookhaven::recorder {
 
-RecordingReport::RecordingReport(std::function<void(const States&)> write) : write_(std::move(write)) {
+StatusPublisher::StatusPublisher(std::function<void(const States&)> write) : write_(std::move(write)) {
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
 
-void RecordingReport::Publish(States states) {
+void StatusPublisher::Publish(States states) {
     const std::lock_guard lock(mutex_);
     next_ = std::move(states);
     published_.notify_one();
 }
 
-void RecordingReport::Run(const std::stop_token& stop) {
+void StatusPublisher::Run(const std::stop_token& stop) {
     std::optional<States> written;
     for (std::unique_lock lock(mutex_); published_.wait(lock, stop, [this] { return next_.has_value(); });) {
         const States states = *std::exchange(next_, std::nullopt);
@@ -33,7 +33,7 @@ void RecordingReport::Run(const std::stop_token& stop) {
     has_ended_ = true;
 }
 
-bool RecordingReport::TryToWrite(const States& states) noexcept {
+bool StatusPublisher::TryToWrite(const States& states) noexcept {
     try {
         write_(states);
         return true;

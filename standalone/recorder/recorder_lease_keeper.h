@@ -20,11 +20,12 @@ struct LeaseTimes {
     std::int64_t expiry_us = 20'000'000;
 };
 
-class LeaseKeeper {
+class RecorderLeaseKeeper {
   public:
     // name: of this installation on this machine. Nobody else with that name runs, so its lease is taken over at once.
     // host: the id of this machine among the hosts of the store; 0 where it is none of them.
-    LeaseKeeper(std::string name, std::function<std::int64_t()> monotonic_us, int host = 0, LeaseTimes times = {})
+    RecorderLeaseKeeper(std::string name, std::function<std::int64_t()> monotonic_us, int host = 0,
+                        LeaseTimes times = {})
         : name_(std::move(name)),
           monotonic_us_(std::move(monotonic_us)),
           host_(host),

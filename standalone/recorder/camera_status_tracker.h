@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The state of each camera as the recorder reports it: its recording's, and since when it has sent nothing.
+// Combines what the recorder reports of each camera: the state of its recording, and since when it has sent nothing.
 //
 // Thread safety One thread.
 #pragma once
@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "standalone/base/installation.h"
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 #include "standalone/recorder/stream_worker.h"
 
 namespace lookhaven::recorder {
@@ -23,14 +23,14 @@ struct CameraSignal {
     StreamSignal stream;
 };
 
-class CameraStates {
+class CameraStatusTracker {
   public:
     // Begins with the cameras that sent nothing when the previous recorder of this installation ended.
-    explicit CameraStates(const base::Installation& installation);
+    explicit CameraStatusTracker(const base::Installation& installation);
 
     // recorded: the states of the recordings, by camera; signals: of the cameras that are connected to, recorded or not.
-    std::vector<maintenance::RecordingStatus> Combine(std::map<int, maintenance::RecordingStatus> recorded,
-                                                      const std::map<int, CameraSignal>& signals);
+    std::vector<maintenance::CameraStatus> Combine(std::map<int, maintenance::CameraStatus> recorded,
+                                                   const std::map<int, CameraSignal>& signals);
 
   private:
     std::map<int, std::int64_t> lost_since_s_;  // by camera

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Two recorders on one store.
-#include "standalone/recorder/lease_keeper.h"
+#include "standalone/recorder/recorder_lease_keeper.h"
 
 #include <gtest/gtest.h>
 
@@ -12,19 +12,19 @@
 namespace lookhaven::recorder {
 namespace {
 
-TEST(LeaseKeeper, OneRecorderAtATimeHoldsAStore) {
+TEST(RecorderLeaseKeeper, OneRecorderAtATimeHoldsAStore) {
     const test::ArchiveFolder home;
     base::Installation::CreateFolders(home.Path());
     store::Store::Migrate(base::Installation(home.Path()).StoreUrl());
     store::Store store = store::Store::Open(base::Installation(home.Path()).StoreUrl());
     std::int64_t now_us = 0;
-    LeaseKeeper first("A", [&] { return now_us; });
-    LeaseKeeper second("B", [&] { return now_us; });
+    RecorderLeaseKeeper first("A", [&] { return now_us; });
+    RecorderLeaseKeeper second("B", [&] { return now_us; });
     for (; now_us < 10 * LeaseTimes().expiry_us; now_us += LeaseTimes().renew_us) {
         EXPECT_TRUE(first.Hold(store, 1));
         EXPECT_FALSE(second.Hold(store, 1));
     }
-    EXPECT_TRUE(LeaseKeeper("A", [&] { return now_us; }).Hold(store, 7)) << "started again";
+    EXPECT_TRUE(RecorderLeaseKeeper("A", [&] { return now_us; }).Hold(store, 7)) << "started again";
     EXPECT_EQ(store::RecorderLease(store).Current().first_reserved_id, 7);
     now_us += LeaseTimes().renew_us;
     EXPECT_FALSE(first.Hold(store, 1));

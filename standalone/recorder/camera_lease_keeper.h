@@ -28,11 +28,11 @@
 
 namespace lookhaven::recorder {
 
-class HostCameras {
+class CameraLeaseKeeper {
   public:
     // Starts the thread. offline_us as in HostWatch. rows: holds the lease of this host's recorder. All outlive this
     // object. Throws std::system_error when no thread can be started.
-    HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us);
+    CameraLeaseKeeper(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us);
 
     // Call every second: does what is due; does not wait. has_room: there is a mount to record to.
     void Ask(bool has_room);

@@ -1,14 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/camera_states.h"
+#include "standalone/recorder/camera_status_tracker.h"
 
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 
 namespace lookhaven::recorder {
 
-CameraStates::CameraStates(const base::Installation& installation) {
+CameraStatusTracker::CameraStatusTracker(const base::Installation& installation) {
     try {
-        for (const maintenance::RecordingStatus& status : maintenance::ReadRecordingStatus(installation)) {
+        for (const maintenance::CameraStatus& status : maintenance::ReadCameraStatus(installation)) {
             if (status.lost_since_s > 0) {
                 lost_since_s_.emplace(status.camera, status.lost_since_s);
             }
@@ -18,10 +18,10 @@ CameraStates::CameraStates(const base::Installation& installation) {
     }
 }
 
-std::vector<maintenance::RecordingStatus> CameraStates::Combine(std::map<int, maintenance::RecordingStatus> recorded,
-                                                                const std::map<int, CameraSignal>& signals) {
+std::vector<maintenance::CameraStatus> CameraStatusTracker::Combine(std::map<int, maintenance::CameraStatus> recorded,
+                                                                    const std::map<int, CameraSignal>& signals) {
     for (const auto& [camera, signal] : signals) {
-        maintenance::RecordingStatus& status = recorded[camera];
+        maintenance::CameraStatus& status = recorded[camera];
         status.camera = camera;
         status.camera_name = signal.camera_name;
         if (signal.stream.codec) {
@@ -35,7 +35,7 @@ std::vector<maintenance::RecordingStatus> CameraStates::Combine(std::map<int, ma
             }
         }
     }
-    std::vector<maintenance::RecordingStatus> list;
+    std::vector<maintenance::CameraStatus> list;
     list.reserve(recorded.size());
     for (const auto& [camera, status] : recorded) {
         list.push_back(status);

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/maintenance/recovery.h"
+#include "standalone/maintenance/mount_recovery.h"
 
 #include <optional>
 #include <string>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/maintenance/recording_status.h"
+#include "standalone/maintenance/camera_status.h"
 
 #include <algorithm>
 #include <array>
@@ -36,9 +36,9 @@ std::string WithoutBreaks(std::string text) {
 }
 
 // Nothing for a line that an older recorder wrote.
-std::optional<RecordingStatus> Parse(const std::string& line) {
+std::optional<CameraStatus> Parse(const std::string& line) {
     std::istringstream fields(line);
-    RecordingStatus status;
+    CameraStatus status;
     std::string state;
     std::string loss;
     if (!(fields >> status.camera >> state >> status.event >> status.dropped_frames >> status.lost_since_s >> loss)) {
@@ -62,9 +62,9 @@ const char* NameOf(RecordingState state) {
     return std::ranges::find(kNames, state, &std::pair<RecordingState, const char*>::first)->second;
 }
 
-void WriteRecordingStatus(const base::Installation& installation, const std::vector<RecordingStatus>& cameras) {
+void WriteCameraStatus(const base::Installation& installation, const std::vector<CameraStatus>& cameras) {
     std::ostringstream text;
-    for (const RecordingStatus& each : cameras) {
+    for (const CameraStatus& each : cameras) {
         text << each.camera << ' ' << NameOf(each.state) << ' ' << each.event << ' ' << each.dropped_frames << ' '
              << each.lost_since_s << ' ' << base::NameOf(each.loss) << ' ' << WithoutBreaks(each.camera_name) << '\t'
              << WithoutBreaks(each.loss_reason) << '\n';
@@ -72,15 +72,15 @@ void WriteRecordingStatus(const base::Installation& installation, const std::vec
     base::WriteFileAtomically(PathOf(installation), text.str());
 }
 
-std::vector<RecordingStatus> ReadRecordingStatus(const base::Installation& installation) {
-    std::vector<RecordingStatus> cameras;
+std::vector<CameraStatus> ReadCameraStatus(const base::Installation& installation) {
+    std::vector<CameraStatus> cameras;
     std::error_code ignored;
     if (!std::filesystem::exists(PathOf(installation), ignored)) {
         return cameras;
     }
     std::istringstream text(base::ReadFile(PathOf(installation)));
     for (std::string line; std::getline(text, line);) {
-        if (const std::optional<RecordingStatus> status = Parse(line)) {
+        if (const std::optional<CameraStatus> status = Parse(line)) {
             cameras.push_back(*status);
         }
     }

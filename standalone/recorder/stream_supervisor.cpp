@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/supervisor.h"
+#include "standalone/recorder/stream_supervisor.h"
 
 #include <algorithm>
 #include <exception>
@@ -21,8 +21,9 @@ constexpr std::int64_t kStandstillUs = 3'000'000;
 
 }  // namespace
 
-Supervisor::Supervisor(const base::Installation& installation, media::SourceKinds kinds,
-                       std::chrono::milliseconds no_data_limit, std::chrono::milliseconds host_offline_limit)
+StreamSupervisor::StreamSupervisor(const base::Installation& installation, media::SourceKinds kinds,
+                                   std::chrono::milliseconds no_data_limit,
+                                   std::chrono::milliseconds host_offline_limit)
     : installation_(installation),
       kinds_(std::move(kinds)),
       no_data_limit_(no_data_limit),
@@ -35,7 +36,7 @@ Supervisor::Supervisor(const base::Installation& installation, media::SourceKind
     Reconcile();  // viewers' requests may be older than this recorder
 }
 
-void Supervisor::Step() {
+void StreamSupervisor::Step() {
     demand_.WaitForDemand(TimeToNextStep());
     if (base::MonotonicMicros() >= next_second_us_) {
         DoEverySecond();
@@ -43,7 +44,7 @@ void Supervisor::Step() {
     Reconcile();
 }
 
-bool Supervisor::Finish(std::chrono::milliseconds limit) {
+bool StreamSupervisor::Finish(std::chrono::milliseconds limit) {
     catalog_.RequestStop();
     recordings_.RequestStop();
     for (const auto& [stream, worker] : workers_) {
@@ -60,13 +61,13 @@ bool Supervisor::Finish(std::chrono::milliseconds limit) {
     return true;
 }
 
-std::chrono::milliseconds Supervisor::TimeToNextStep() const {
+std::chrono::milliseconds StreamSupervisor::TimeToNextStep() const {
     const std::chrono::microseconds left(std::max<std::int64_t>(0, next_second_us_ - base::MonotonicMicros()));
     const auto rounded_up = std::chrono::ceil<std::chrono::milliseconds>(left);
     return some_are_ending_ ? std::min(kPollWhileEnding, rounded_up) : rounded_up;
 }
 
-void Supervisor::DoEverySecond() {
+void StreamSupervisor::DoEverySecond() {
     const std::int64_t now_us = base::MonotonicMicros();
     if (next_second_us_ != 0 && now_us - next_second_us_ > kStandstillUs) {
         base::LogWarning("the recorder did not run for " + std::to_string((now_us - next_second_us_) / 1'000'000) +
@@ -89,7 +90,7 @@ void Supervisor::DoEverySecond() {
     }
 }
 
-void Supervisor::Reconcile() {
+void StreamSupervisor::Reconcile() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     recordings_.Reconcile(*catalog);
     std::vector<control::LiveStream> needed = demand_.ActiveStreams(base::MonotonicMicros());
@@ -123,7 +124,7 @@ void Supervisor::Reconcile() {
     }
 }
 
-std::map<int, CameraSignal> Supervisor::Signals() const {
+std::map<int, CameraSignal> StreamSupervisor::Signals() const {
     std::map<int, CameraSignal> signals;
     for (const auto& [stream, worker] : workers_) {
         const CameraSignal signal{worker->Plan().camera_name, recordings_.QueueOf(stream) != nullptr, worker->Signal()};
@@ -135,7 +136,7 @@ std::map<int, CameraSignal> Supervisor::Signals() const {
     return signals;
 }
 
-void Supervisor::PublishCounters() {
+void StreamSupervisor::PublishCounters() {
     const std::int64_t now_us = base::MonotonicMicros();
     std::vector<control::StreamCounters> streams;
     streams.reserve(workers_.size());
@@ -158,7 +159,7 @@ void Supervisor::PublishCounters() {
 }
 
 // A camera may be reconfigured or exchanged without anybody changing its record here.
-void Supervisor::CorrectVideoTypes() {
+void StreamSupervisor::CorrectVideoTypes() {
     const std::shared_ptr<const CatalogContents> catalog = catalog_.Current();
     for (const auto& [stream, worker] : workers_) {
         const auto plan = catalog->cameras.find(stream.camera);
@@ -170,11 +171,11 @@ void Supervisor::CorrectVideoTypes() {
     }
 }
 
-void Supervisor::DropEndedWorkers() {
+void StreamSupervisor::DropEndedWorkers() {
     std::erase_if(workers_, [](const auto& entry) { return entry.second->HasEnded(); });
 }
 
-void Supervisor::Start(control::LiveStream stream, const StreamPlan& plan) {
+void StreamSupervisor::Start(control::LiveStream stream, const StreamPlan& plan) {
     try {
         workers_.emplace(stream, std::make_unique<StreamWorker>(installation_, kinds_, stream, plan, no_data_limit_));
         reported_failures_.erase(stream);

@@ -23,14 +23,14 @@
 
 namespace lookhaven::recorder {
 
-class Supervisor {
+class StreamSupervisor {
   public:
     // Removes the shared memory that a dead recorder of this installation left. The installation must outlive the
     // supervisor. host_offline_limit: how long a host's heartbeat stands still until others take its cameras over. Throws
     // std::system_error when the shared tables cannot be made.
-    Supervisor(const base::Installation& installation, media::SourceKinds kinds,
-               std::chrono::milliseconds no_data_limit,
-               std::chrono::milliseconds host_offline_limit = kHostOfflineLimit);
+    StreamSupervisor(const base::Installation& installation, media::SourceKinds kinds,
+                     std::chrono::milliseconds no_data_limit,
+                     std::chrono::milliseconds host_offline_limit = kHostOfflineLimit);
 
     // One pass: waits up to a second for something to do and does it. A signal ends the wait early.
     void Step();

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/host_cameras.h"
+#include "standalone/recorder/camera_lease_keeper.h"
 
 #include <algorithm>
 #include <string>
@@ -20,7 +20,8 @@ std::int64_t HeartbeatOf(const std::vector<store::Host>& hosts, int id) {
 
 }  // namespace
 
-HostCameras::HostCameras(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us)
+CameraLeaseKeeper::CameraLeaseKeeper(const base::Installation& installation, const EventRowQueue& rows,
+                                     std::int64_t offline_us)
     : installation_(installation),
       rows_(rows),
       own_(installation.HostId()),
@@ -29,7 +30,7 @@ HostCameras::HostCameras(const base::Installation& installation, const EventRowQ
       thread_(installation.StoreUrl(), "share the cameras with the other hosts",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
-void HostCameras::Ask(bool has_room) {
+void CameraLeaseKeeper::Ask(bool has_room) {
     has_room_ = has_room;
     if (has_room) {
         no_room_since_us_ = 0;
@@ -39,24 +40,24 @@ void HostCameras::Ask(bool has_room) {
     thread_.Ask();
 }
 
-std::set<int> HostCameras::Held() const {
+std::set<int> CameraLeaseKeeper::Held() const {
     const std::lock_guard lock(mutex_);
     seen_ = published_;
     return held_;
 }
 
-bool HostCameras::IsHeldElsewhere(int camera) const {
+bool CameraLeaseKeeper::IsHeldElsewhere(int camera) const {
     const std::lock_guard lock(mutex_);
     return !held_elsewhere_ || held_elsewhere_->contains(camera);
 }
 
-void HostCameras::NoteRecorded(std::set<int> cameras) {
+void CameraLeaseKeeper::NoteRecorded(std::set<int> cameras) {
     const std::lock_guard lock(mutex_);
     recorded_ = std::move(cameras);
     noted_ = seen_;
 }
 
-void HostCameras::Work(store::Store& store) {
+void CameraLeaseKeeper::Work(store::Store& store) {
     store::Hosts hosts(store);
     const std::vector<store::Host> all = hosts.All();
     const std::vector<AssignedHost> watched = Observe(all);
@@ -98,7 +99,7 @@ void HostCameras::Work(store::Store& store) {
     Report(watched, cameras);
 }
 
-std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& all) {
+std::vector<AssignedHost> CameraLeaseKeeper::Observe(const std::vector<store::Host>& all) {
     watch_.Observe(all, base::MonotonicMicros());
     std::vector<AssignedHost> hosts;
     for (const store::Host& host : all) {
@@ -117,7 +118,7 @@ std::vector<AssignedHost> HostCameras::Observe(const std::vector<store::Host>& a
     return hosts;
 }
 
-void HostCameras::Publish(std::set<int> held) {
+void CameraLeaseKeeper::Publish(std::set<int> held) {
     const std::lock_guard lock(mutex_);
     if (held != held_) {
         held_ = std::move(held);
@@ -125,7 +126,7 @@ void HostCameras::Publish(std::set<int> held) {
     }
 }
 
-void HostCameras::NoteHolders(const std::vector<store::CameraLease>& cameras) {
+void CameraLeaseKeeper::NoteHolders(const std::vector<store::CameraLease>& cameras) {
     std::set<int> elsewhere;
     for (const store::CameraLease& camera : cameras) {
         if (camera.host_id != 0 && camera.host_id != own_) {
@@ -136,7 +137,7 @@ void HostCameras::NoteHolders(const std::vector<store::CameraLease>& cameras) {
     held_elsewhere_ = std::move(elsewhere);
 }
 
-bool HostCameras::HasEnded(int camera) const {
+bool CameraLeaseKeeper::HasEnded(int camera) const {
     {
         const std::lock_guard lock(mutex_);
         if (noted_ != published_ || recorded_.contains(camera)) {
@@ -146,7 +147,7 @@ bool HostCameras::HasEnded(int camera) const {
     return !rows_.HasUnstored(camera);
 }
 
-void HostCameras::Report(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+void CameraLeaseKeeper::Report(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
     std::vector<maintenance::HostStatus> states;
     for (const AssignedHost& host : hosts) {
         const auto count = std::ranges::count(cameras, host.id, &store::CameraLease::host_id);

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "standalone/recorder/lease_keeper.h"
+#include "standalone/recorder/recorder_lease_keeper.h"
 
 #include <utility>
 
@@ -8,7 +8,7 @@
 
 namespace lookhaven::recorder {
 
-bool LeaseKeeper::Hold(store::Store& store, int first_reserved_id) {
+bool RecorderLeaseKeeper::Hold(store::Store& store, int first_reserved_id) {
     const std::int64_t now_us = monotonic_us_();
     if (held_count_ && now_us - changed_us_ < times_.renew_us && first_reserved_id == told_first_reserved_id_) {
         return true;
@@ -33,7 +33,7 @@ bool LeaseKeeper::Hold(store::Store& store, int first_reserved_id) {
     return held_count_.has_value();
 }
 
-void LeaseKeeper::Release(store::Store& store) {
+void RecorderLeaseKeeper::Release(store::Store& store) {
     if (held_count_) {
         store::RecorderLease(store, host_).Release(*held_count_, name_);
         held_count_.reset();
@@ -41,7 +41,7 @@ void LeaseKeeper::Release(store::Store& store) {
 }
 
 // On a store with hosts, a machine that is none of them would record their cameras a second time.
-bool LeaseKeeper::IsRefused(store::Store& store) {
+bool RecorderLeaseKeeper::IsRefused(store::Store& store) {
     store::Hosts hosts(store);
     std::string refusal;
     if (host_ != 0 && !hosts.Find(host_)) {
@@ -55,7 +55,7 @@ bool LeaseKeeper::IsRefused(store::Store& store) {
     return !refusal.empty();
 }
 
-bool LeaseKeeper::MayTake(const store::LeaseState& state, std::int64_t now_us) {
+bool RecorderLeaseKeeper::MayTake(const store::LeaseState& state, std::int64_t now_us) {
     if (held_count_) {
         // A store that lost its last second, as after a crash of its server, has an older count of ours.
         return state.count == *held_count_ || (state.holder == name_ && state.count < *held_count_);
