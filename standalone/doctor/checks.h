@@ -53,6 +53,8 @@ Json::Value ToJson(const Findings& findings);
 
 // folder_checks.cpp
 Findings CheckFolder(const base::Installation& installation);
+// Whether it finds nothing that keeps this user from writing to the state folder, and to the store where it lies there.
+bool IsStateWritable(const base::Installation& installation);
 
 // store_checks.cpp
 Findings CheckStore(const base::Installation& installation);

@@ -44,7 +44,7 @@ Findings CheckSpace(const std::string& home) {
              "free space on it; if recordings lie there, lower the limit of their mount with lookhaven mount set"}};
 }
 
-// The state folder holds secrets: cameras' passwords, the TLS key.
+// The state folder holds secrets: cameras' passwords, the TLS key. Who may enter it reaches by name what it holds.
 Findings CheckPrivacy(const std::string& path) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0) {
@@ -57,8 +57,8 @@ Findings CheckPrivacy(const std::string& path) {
     if (status.st_uid != ::geteuid()) {
         findings.push_back({Concat(path, " belongs to ", UserName(status.st_uid)),
                             Concat("as root: chown -R ", OwnName(), ": ", Quoted(path))});
-    } else if (::access(path.c_str(), R_OK | W_OK) != 0) {
-        findings.push_back({path + " does not permit its owner to write to it", "chmod u+rw " + Quoted(path)});
+    } else if (::access(path.c_str(), S_ISDIR(status.st_mode) ? R_OK | W_OK | X_OK : R_OK | W_OK) != 0) {
+        findings.push_back({path + " does not permit its owner to write to it", "chmod u+rwX " + Quoted(path)});
     }
     return findings;
 }
@@ -114,6 +114,13 @@ Findings CheckFolder(const base::Installation& installation) {
         std::ranges::move(CheckPrivacy(path), std::back_inserter(findings));
     }
     return findings;
+}
+
+bool IsStateWritable(const base::Installation& installation) {
+    const std::string home = installation.Home().string();
+    const std::string database = home + "/lookhaven.db";
+    return ::access(home.c_str(), R_OK | W_OK | X_OK) == 0 && CheckSpace(home).empty() &&
+           (::access(database.c_str(), R_OK | W_OK) == 0 || errno == ENOENT);
 }
 
 }  // namespace lookhaven::doctor

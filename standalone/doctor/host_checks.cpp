@@ -2,6 +2,7 @@
 //
 // The hosts that share this one's store, as its recorder sees them, and the standbys of that store.
 #include <algorithm>
+#include <system_error>
 
 #include "standalone/base/concat.h"
 #include "standalone/control/common_config.h"
@@ -66,6 +67,11 @@ Findings CheckHosts(const base::Installation& installation) {
         }
     } catch (const store::StoreError&) {
         return {};  // CheckStore reports it
+    } catch (const std::system_error&) {
+        if (IsStateWritable(installation)) {
+            throw;
+        }
+        return {};  // CheckFolder reports it
     }
     return findings;
 }

@@ -1,12 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The web API host and the recorder: whether they run and do their work.
+#include <cerrno>
+
+#include <unistd.h>
+
 #include "standalone/control/common_config.h"
 #include "standalone/doctor/checks.h"
 #include "standalone/doctor/host_answers.h"
 #include "standalone/store/recorder_lease.h"
 
 namespace lookhaven::doctor {
+
+namespace {
+
+// Whether this user may look at what the processes leave in their folder; if not, CheckFolder reports it.
+bool IsReachable(const base::Installation& installation) {
+    return ::access(installation.RunFolder().c_str(), R_OK | W_OK | X_OK) == 0 || errno == ENOENT;
+}
+
+}  // namespace
 
 // An installation of the packages is run by services.
 std::string HowToStart(const base::Installation& installation, const std::filesystem::path& log) {
@@ -15,7 +28,7 @@ std::string HowToStart(const base::Installation& installation, const std::filesy
 }
 
 Findings CheckHost(const base::Installation& installation) {
-    if (HostAnswers(installation)) {
+    if (HostAnswers(installation) || !IsReachable(installation)) {
         return {};
     }
     return {{"the web API host does not answer at " + installation.WebApiSocket().string(),
@@ -24,7 +37,7 @@ Findings CheckHost(const base::Installation& installation) {
 
 Findings CheckRecorder(const base::Installation& installation) {
     const control::RecorderState state = control::FindRecorder(installation);
-    if (state == control::RecorderState::kAlive) {
+    if (state == control::RecorderState::kAlive || !IsReachable(installation)) {
         return {};
     }
     if (state == control::RecorderState::kHangs) {

@@ -2,10 +2,7 @@
 //
 // The record store: whether it can be read, belongs to this program, and makes sense.
 #include <algorithm>
-#include <cerrno>
 #include <filesystem>
-
-#include <unistd.h>
 
 #include "standalone/doctor/checks.h"
 #include "standalone/store/users.h"
@@ -32,9 +29,6 @@ Finding FindingOf(const std::string& sentence) {
 
 Findings CheckStore(const base::Installation& installation) {
     const std::filesystem::path file = installation.Home() / "lookhaven.db";
-    if (::access(file.c_str(), R_OK | W_OK) != 0 && errno != ENOENT) {
-        return {};  // CheckFolder reports it
-    }
     try {
         store::Store store = store::Store::Open(installation.StoreUrl());
         Findings findings;
@@ -42,9 +36,10 @@ Findings CheckStore(const base::Installation& installation) {
             findings.push_back(IsMalformed(sentence) ? Finding{sentence, kRestore} : FindingOf(sentence));
         }
         const std::vector<store::User> users = store::Users(store).List();
-        if (std::ranges::none_of(users, [](const store::User& user) { return user.IsManager(); })) {
-            findings.push_back({"no account may manage this installation",
-                                users.empty() ? "lookhaven setup-address" : "lookhaven init --admin NAME"});
+        if (users.empty()) {
+            findings.push_back({"there is no account yet", "lookhaven setup-address"});
+        } else if (std::ranges::none_of(users, [](const store::User& user) { return user.IsManager(); })) {
+            findings.push_back({"no account may manage this installation", "lookhaven init --admin NAME"});
         }
         return findings;
     } catch (const store::SchemaError& error) {
@@ -52,13 +47,21 @@ Findings CheckStore(const base::Installation& installation) {
         const bool is_newer = sentence.find("newer") != std::string::npos;
         return {{sentence, is_newer ? "update Lookhaven on this host" : "lookhaven init"}};
     } catch (const store::StoreError& error) {
+        const bool is_malformed = IsMalformed(error.what());
+        const bool is_own_file = installation.StoreUrl() == "sqlite:" + file.string();
+        if (is_own_file && !is_malformed && !IsStateWritable(installation)) {
+            return {};  // CheckFolder reports it
+        }
         return {{error.what(),
-                 IsMalformed(error.what()) ? kRestore
-                 : installation.StoreUrl() == "sqlite:" + file.string()
+                 is_malformed ? kRestore
+                 : is_own_file
                      ? "check that the file lookhaven.db is there and that you have access"
                      : "check the address in the file \"store\" in the state folder, and whether what it names can be "
                        "reached"}};
     } catch (const std::exception& error) {
+        if (!IsStateWritable(installation)) {
+            return {};  // CheckFolder reports it
+        }
         return {{error.what(), "check the file \"store\" in the state folder"}};
     }
 }

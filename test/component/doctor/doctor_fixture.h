@@ -5,6 +5,7 @@
 
 #include <functional>
 #include <memory>
+#include <optional>
 #include <set>
 #include <span>
 #include <string>
@@ -12,6 +13,8 @@
 
 #include <unistd.h>
 
+#include "standalone/control/common_config.h"
+#include "standalone/doctor/checks.h"
 #include "standalone/maintenance/camera_status.h"
 #include "test/component/cli/fake_host.h"
 #include "test/component/cli/program.h"
@@ -37,14 +40,21 @@ class DoctorTest : public cli::DemoTest {
 
     cli::Outcome Examine();
 
-    // Each fault by itself is found, as the only one; what mends it leaves none and loses nothing.
-    void ExpectFoundAndMended(std::span<const Fault> faults);
+    // Each fault, or note, by itself is found, as the only one; what mends it leaves none and loses nothing.
+    void ExpectFoundAndMended(std::span<const Fault> faults, Severity severity = Severity::kFault);
 
     // Causes and mends of faults.
     std::function<void()> Sql(const std::string& statement);
     static std::function<void()> Shell(const std::string& command);
     std::function<void()> WriteStatus(const std::vector<maintenance::CameraStatus>& cameras);
     std::function<void()> MakeCertificate(int days);
+    // Where the remedies' CERTIFICATE and KEY are.
+    void MakeOwnersCertificate();
+    // By a recorder that is killed.
+    void LeaveSegment(std::uint32_t layout_version) const;
+
+    // From then on this process has mounts of its own, where it may mount at all.
+    static bool MayMount();
 
     // The owner of the installation: what this process makes is then as the server's.
     void BecomeOwner() const;
@@ -60,6 +70,7 @@ class DoctorTest : public cli::DemoTest {
     std::set<std::string> Kept();
 
     std::unique_ptr<cli::FakeHost> host_;
+    std::optional<control::CommonConfigKeeper> recorder_;
 };
 
 }  // namespace lookhaven::doctor

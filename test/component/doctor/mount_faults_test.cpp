@@ -4,9 +4,6 @@
 #include <string>
 #include <vector>
 
-#include <sched.h>
-#include <sys/mount.h>
-
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/events.h"
@@ -18,8 +15,7 @@ namespace {
 using maintenance::MountState;
 
 TEST_F(DoctorTest, FaultsOfMountsAreFoundAndMendedWithoutLoss) {
-    const bool may_mount =
-        is_root_ && ::unshare(CLONE_NEWNS) == 0 && ::mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0;
+    const bool may_mount = MayMount();
     const std::string recordings = Recordings();
     const std::string marker = recordings + "/.lookhaven-mount";
     const auto report = [&](const maintenance::MountStatus& status) {

@@ -13,7 +13,7 @@
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/host_status.h"
 #include "standalone/ring/inventory.h"
-#include "standalone/ring/writer.h"
+#include "standalone/ring/segment.h"
 #include "standalone/store/servers.h"
 #include "test/component/doctor/doctor_fixture.h"
 #include "test/support/process.h"
@@ -64,7 +64,13 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
          Sql("update recorder_lease set holder = ''")},
         {"mute host", [&] { StartHost(""); }, "do: start the server", [&] { StartHost(); }},
         {"no host", [&] { std::filesystem::remove(socket); }, "the web API host does not answer", [&] { StartHost(); }},
-        {"expired certificate", MakeCertificate(0), "has expired", MakeCertificate(90)},
+        {"expired certificate",
+         [&] {
+             MakeCertificate(90)();
+             MakeOwnersCertificate();
+             MakeCertificate(0)();
+         },
+         "has expired"},
         {"damaged certificate", Shell(": > " + home_.string() + "/tls/certificate.pem"),
          "cannot be used: ", MakeCertificate(90)},
         {"no web server", [&] { std::ofstream(configuration) << "    listen 127.0.0.1:" << port << " sndbuf=192k;\n"; },
@@ -83,6 +89,7 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
              store::RecordingServers(store).Add(annex, std::string(64, 'a'));
          },
          "Annex at 127.0.0.1 port 1 fails: ", [&] { EXPECT_EQ(Run("server set 1 --disable").code, 0); }},
+        {"segment of another version", [&] { LeaveSegment(99); }, "was created by another version"},
     };
     ExpectFoundAndMended(faults);
 }
@@ -154,6 +161,13 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
              report(maintenance::HostState::kOffline)();
          },
          "host nvr2 is offline", report(maintenance::HostState::kOnline)},
+        {"further host without a mount",
+         [&] {
+             Sql("update mounts set host_id = 2")();
+             Shell("mkdir " + Recordings() + "-new && chown --reference=" + home_.string() + " " + Recordings() +
+                   "-new")();
+         },
+         "do: lookhaven mount add FOLDER\n"},
     };
     ExpectFoundAndMended(faults);
     Sql("update hosts set version = 'v' || id")();
@@ -165,14 +179,7 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {
     EXPECT_THAT(Run("doctor").text, HasSubstr("the recorder has not run"));
     const base::Installation installation(home_);
-    test::WaitFor(test::InChild([&] {
-        BecomeOwner();
-        const ring::Writer writer(
-            installation, {1, 0, base::Medium::kVideo},
-            {.codec = "MJPEG", .extra_data = {}, .width = 64, .height = 48, .every_frame_is_key = true},
-            ring::GeometryFor({.every_frame_is_key = true}));
-        _exit(0);  // as if killed
-    }));
+    LeaveSegment(ring::kLayoutVersion);
     const cli::Outcome outcome = Examine();
     EXPECT_EQ(outcome.code, 1) << outcome.text;
     EXPECT_THAT(outcome.text, HasSubstr("of camera 1 was left behind"));
