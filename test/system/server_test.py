@@ -60,12 +60,13 @@ class ServerTest(unittest.TestCase):
                 ("folder too long for a socket", {"LOOKHAVEN_HOME": f"{folder}/{'a' * 90}"}, ["too long"]),
                 ("folder with a quote", {"LOOKHAVEN_HOME": f'{folder}/a"b'}, ['a"b', "LOOKHAVEN_HOME"]),
             ]
-            newer = f"{folder}/newer"
-            said_by(BUILD / "bin/lookhaven", "--home", newer, "init")
-            with contextlib.closing(sqlite3.connect(f"{newer}/lookhaven.db", isolation_level=None)) as store:
-                store.execute("update schema_version set version = 999")
-                store.execute("update settings set value = '999' where name = 'schema_compatible'")
-            rows.append(("newer store", {"LOOKHAVEN_HOME": newer}, ["schema 999", "update Lookhaven"]))
+            for age, version, words in (("newer", 999, ["schema 999", "update Lookhaven"]), ("older", 1, ["schema 1", "lookhaven init"])):
+                home = f"{folder}/{age}"
+                said_by(BUILD / "bin/lookhaven", "--home", home, "init")
+                with contextlib.closing(sqlite3.connect(f"{home}/lookhaven.db", isolation_level=None)) as store:
+                    store.execute("update schema_version set version = ?", (version,))
+                    store.execute("update settings set value = ? where name = 'schema_compatible'", (version,))
+                rows.append((f"{age} store", {"LOOKHAVEN_HOME": home}, words))
             if os.geteuid() == 0:
                 rows.append(("folder of something else", {"LOOKHAVEN_HOME": folder}, [folder, "LOOKHAVEN_HOME"]))
             for name, environment, words in rows:
@@ -82,6 +83,32 @@ class ServerTest(unittest.TestCase):
                 pathlib.Path(folder, name).chmod(0o755)
             server = Installation(PATH=f"{folder}:{os.environ['PATH']}", LOOKHAVEN_BUILD_FOLDER="")
             self.check_refusal(server, ["libsodium-dev", "Unable to fetch", "apt-get install"], 60)
+
+    def test_it_says_that_it_runs_once_a_request_is_answered(self):
+        # A web API host that ends the first connections without an answer, so that the web server tells of a bad gateway.
+        late = """#!/usr/bin/python3
+import os, socket, sys
+words = sys.argv[1:]
+path = words[words.index("--socket") + 1]
+with socket.socket(socket.AF_UNIX) as listener:
+    listener.bind(path)
+    listener.listen()
+    for _ in range(3):
+        listener.accept()[0].close()
+os.unlink(path)
+os.execv("{program}", ["{program}", *words])
+"""
+        with tempfile.TemporaryDirectory() as folder:
+            build, program = pathlib.Path(folder, "build"), BUILD / "bin/lookhaven-webapi"
+            (build / "bin").mkdir(parents=True)
+            for name in ("lib", *(f"bin/{file.name}" for file in (BUILD / "bin").iterdir() if file != program)):
+                (build / name).symlink_to(BUILD / name)
+            (build / "bin/lookhaven-webapi").write_text(late.format(program=program))
+            for path in (folder, build, build / "bin", build / "bin/lookhaven-webapi"):
+                os.chmod(path, 0o755)
+            with Installation(LOOKHAVEN_BUILD_FOLDER=str(build), LOOKHAVEN_DEMO="no") as server:
+                self.assertIn("Lookhaven is running", server.said())
+                self.assertTrue(server.answers(), "at once")
 
     def test_second_start_on_the_same_folder(self):
         with Installation(LOOKHAVEN_DEMO="no") as first:

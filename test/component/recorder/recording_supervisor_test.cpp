@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Maintenance of several mounts, one of which fails, and threads that cannot be had.
+// Maintenance of several mounts, one of which fails, threads that cannot be had, and a camera's first event.
 #include "standalone/recorder/recording_supervisor.h"
 
 #include <cerrno>
@@ -10,10 +10,12 @@
 #include <gtest/gtest.h>
 #include <pthread.h>
 
+#include "standalone/base/clock.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
 #include "test/support/footage/archive_folder.h"
+#include "test/support/footage/clips.h"
 #include "test/support/wait.h"
 
 namespace {
@@ -140,6 +142,27 @@ TEST_F(RecordingSupervisorTest, AThreadThatCannotBeHadIsTriedAgainAndCostsNoOthe
         }
         return states == "ready no-signal since ready ";
     })) << "what is to be recorded and does not come";
+    supervisor.RequestStop();
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
+}
+
+TEST_F(RecordingSupervisorTest, FirstEventsGetTheirIdsWithoutWaitingForTheNextSecond) {
+    const std::string own = maintenance::MarkerFor(store_, 1).installation;
+    const int mount = AddMount(home_ / "disk", own);
+    RecordingSupervisor supervisor(installation_, std::chrono::seconds(1));
+    CatalogContents catalog;
+    for (const int camera : {1, 2, 3}) {
+        catalog.cameras[camera] = {"Camera", store::RecordMode::kAlways, 60, 0, 0, mount, home_ / "disk", own};
+    }
+    supervisor.Reconcile(catalog);
+    media::Packet picture = test::MakeClip(test::kMjpeg).At(0);
+    EXPECT_TRUE(test::Eventually([&] {
+        picture.timestamp_us = base::MonotonicMicros();
+        for (const int camera : {1, 2, 3}) {
+            supervisor.QueueOf({camera, 0})->Push(picture, std::nullopt);
+        }
+        return store::Events(store_).Open().size() == 3;
+    })) << "only the start asks for ids here";
     supervisor.RequestStop();
     EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&] { return supervisor.HasEnded(); }));
 }
