@@ -44,7 +44,7 @@ class Recorder {
   public:
     Recorder(const base::Installation& installation, int first, int count, int event_s, int mark_s)
         : rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId()),
-          hosts_(installation, rows_, kOfflineUs),
+          camera_leases_(installation, rows_, kOfflineUs),
           catalog_(installation.StoreUrl(), installation.HostId(), [] {}),
           store_(store::Store::Open(installation.StoreUrl())),
           event_s_(event_s),
@@ -59,7 +59,7 @@ class Recorder {
 
     // What a second brings.
     void Step(std::int64_t now_s) {
-        const std::set<int> held = hosts_.Held();
+        const std::set<int> held = camera_leases_.Held();
         std::set<int> recorded;
         for (Camera& camera : cameras_) {
             if (held.contains(camera.id)) {
@@ -68,8 +68,8 @@ class Recorder {
             }
         }
         rows_.Refresh(cameras_.size());
-        hosts_.NoteRecorded(std::move(recorded));
-        hosts_.Ask(true);
+        camera_leases_.NoteRecorded(std::move(recorded));
+        camera_leases_.Ask(true);
         catalog_.Refresh();
     }
 
@@ -79,7 +79,7 @@ class Recorder {
     }
 
     void Stop() {
-        hosts_.RequestStop();
+        camera_leases_.RequestStop();
         catalog_.RequestStop();
         rows_.RequestStop();
     }
@@ -126,7 +126,7 @@ class Recorder {
     }
 
     recorder::EventRowQueue rows_;
-    recorder::CameraLeaseKeeper hosts_;
+    recorder::CameraLeaseKeeper camera_leases_;
     recorder::Catalog catalog_;
     store::Store store_;
     const int event_s_;
