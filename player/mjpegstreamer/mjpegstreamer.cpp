@@ -1,21 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Dispatches the methods of event playback, and makes the process the player of its session.
+// Makes the process the player of its session, and shows a warning where it cannot.
 #include "player/mjpegstreamer/mjpegstreamer.h"
 
 #include <cstdio>
 
 #include "player/mjpegstreamer/player_session.h"
-
-void MjpegStreamHandler::HandleProcess() {
-    g_PlayerSessionId = m_pRequest->GetSessionID();
-    const std::string method = m_pRequest->GetAPIMethod();
-    if (method == "PlayMjpegEvent") {
-        HandlePlayEvent();
-    } else if (method == "PlayMjpegEventNoFrameId") {
-        HandlePlayEventNoFrameId();
-    }
-}
 
 bool MjpegStreamHandler::TakeSession(const char* func) {
     if (!SetupPlayerSignals()) {

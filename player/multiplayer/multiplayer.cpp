@@ -1,29 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Dispatches the methods of event search, and selects the cameras of a search.
+// Who may search, and the cameras of a search.
 #include "player/multiplayer/multiplayer.h"
 
 #include "player/iter2string.h"
-#include "player/multiplayer/time_zone_keys.h"
-
-const std::array<std::string, 43> kTimeZoneKeys = {
-    "utc_n720", "utc_n660", "utc_n600", "utc_n570", "utc_n540", "utc_n510", "utc_n480", "utc_n420", "utc_n360",
-    "utc_n300", "utc_n270", "utc_n240", "utc_n210", "utc_n180", "utc_n150", "utc_n120", "utc_n60",  "utc_0",
-    "utc_60",   "utc_120",  "utc_180",  "utc_210",  "utc_240",  "utc_270",  "utc_300",  "utc_330",  "utc_345",
-    "utc_360",  "utc_390",  "utc_420",  "utc_480",  "utc_510",  "utc_525",  "utc_540",  "utc_570",  "utc_600",
-    "utc_630",  "utc_660",  "utc_720",  "utc_765",  "utc_780",  "utc_825",  "utc_840",
-};
-
-void MultiPlayerHandler::HandleProcess() {
-    const std::string method = m_pRequest->GetAPIMethod();
-    LH_TRACE(LOG_CATEG_PLAYER, LOG_LEVEL_INFO, kMultiPlayerSource, "Method [%s], Params [%s]\n", method.c_str(),
-             m_pRequest->GetParam("", Json::Value()).toStyledString().c_str());
-    if (method == "EnumEvent") {
-        HandleEnumEvent();
-    } else if (method == "SearchAvaiDate") {
-        HandleSearchAvaiDate();
-    }
-}
 
 bool MultiPlayerHandler::CheckProfile(const PrivProfile& profile, unsigned int uid, const char* func) {
     if (profile.GetId() >= 1) {
