@@ -4,7 +4,8 @@
 
 import { delay } from "../wire/delay";
 import type { Semaphore } from "../wire/semaphore";
-import type { Camera, Server } from "../wire/server";
+import type { Camera } from "../wire/camera";
+import type { Server } from "../wire/server";
 import type { Frame, LiveSource } from "./source";
 
 /** Short, since a camera that does not answer must not hold up the others. */

@@ -11,7 +11,8 @@
 
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
-import { kVideoTypeMjpeg, ServerError, type Camera, type Server } from "../wire/server";
+import { kVideoTypeMjpeg, type Camera } from "../wire/camera";
+import { ServerError, type Server } from "../wire/server";
 import type { AudioPlayer } from "./audio_player";
 import { captureOf, mediaOf } from "./media_part";
 import type { Frame, LiveSource } from "./source";

@@ -6,9 +6,9 @@
 //               new is counted again from the store, and is the same in all tabs of a browser; where the user looks in
 //               one of them, the others hear of it.
 
+import type { Camera } from "./camera";
 import type { RawMark } from "./footage";
 import type { LastLookStore } from "./last_look";
-import type { Camera } from "./server";
 
 /** How long a camera's picture has its frame. */
 export const kFrameMs = 10_000;

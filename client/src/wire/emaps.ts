@@ -2,7 +2,8 @@
 //
 // E-maps of the web API: the picture with its items for viewers, the plain list of items for the editor.
 
-import type { Camera, Server } from "./server";
+import type { Camera } from "./camera";
+import type { Server } from "./server";
 
 /** The numbers of the kinds on the wire. */
 export const kKinds = ["camera", "emap", "door", "io", "pos"] as const;

@@ -3,9 +3,10 @@
 // The web API as the client uses it: typed answers, and for each failure one sentence for the user.
 
 import { Alerts } from "./alerts";
+import { kVideoTypeMjpeg, type Camera, type CameraList, type Snapshot, type StillCamera } from "./camera";
 import { Deadline } from "./deadline";
 import { sentenceOf } from "./sentence";
-import { SignalLosses } from "./signal_losses";
+import { SignalLosses, type CameraStates } from "./signal_losses";
 import { postFile, type UploadOptions } from "./upload";
 
 export interface Account {
@@ -15,40 +16,6 @@ export interface Account {
   /** How many recordings one session may play side by side; 1 where the server does not say. */
   players_per_session?: number;
 }
-
-export interface Camera {
-  id: number;
-  name: string;
-  video_type: number;
-  liveview_port: number;
-  cam_ptz: number;
-  sound_support: number;
-  /** The paired host that owns it, where it has this id; absent or 0: this host's own. */
-  server?: number;
-}
-
-/** What a picture is asked for with. */
-export type StillCamera = Pick<Camera, "id" | "video_type" | "server">;
-
-/** Answer of LoadCamera. */
-export interface CameraList {
-  /** Absent when no camera is enabled. */
-  camera?: Camera[];
-  selected: number;
-  isManager: boolean;
-  ShowAll: number;
-  CamNum: number;
-  EnableCamNum: number;
-}
-
-export interface Snapshot {
-  jpeg: Blob;
-  /** Unix milliseconds. */
-  takenMs: number;
-}
-
-/** The video type whose live view is a sequence of JPEG pictures. */
-export const kVideoTypeMjpeg = 1;
 
 const kAnswerTimeoutMs = 20_000;
 /** Once the last byte of a file has gone, the server may work on it. */
@@ -117,7 +84,9 @@ export class Server {
   /** As of now, while they are watched. */
   readonly alerts = new Alerts();
   /** As of the last refresh. */
-  readonly signalLosses = new SignalLosses(this);
+  readonly signalLosses = new SignalLosses(() =>
+    this.call<CameraStates>("VEXO.Catalog", "CameraStates", {}, { quiet: true }),
+  );
   readonly #onSessionEnd: () => void;
 
   /** `onSessionEnd` is called whenever an answer says that there is no session (any more). */

@@ -2,7 +2,7 @@
 //
 // Which cameras send no picture, since when and why, as the recorder knows it.
 
-import type { Camera, Server } from "./server";
+import type { Camera } from "./camera";
 
 export interface SignalLoss {
   /** Unix milliseconds; when it was first noticed. */
@@ -12,7 +12,7 @@ export interface SignalLoss {
 }
 
 /** Answer of CameraStates. */
-interface CameraStates {
+export interface CameraStates {
   camera: { id: number; state: string; no_signal?: { since: number; cause: string } }[];
 }
 
@@ -31,17 +31,18 @@ export function causeText(cause: string): string {
 }
 
 export class SignalLosses {
-  readonly #server: Server;
+  readonly #ask: () => Promise<CameraStates>;
   readonly #known = new Map<number, SignalLoss>();
 
-  constructor(server: Server) {
-    this.#server = server;
+  /** `ask` asks the server for the states as they are now. */
+  constructor(ask: () => Promise<CameraStates>) {
+    this.#ask = ask;
   }
 
   /** Asks the server. A failure changes nothing: the pictures themselves show that something is wrong. */
   async refresh(): Promise<void> {
     try {
-      const { camera } = await this.#server.call<CameraStates>("VEXO.Catalog", "CameraStates", {}, { quiet: true });
+      const { camera } = await this.#ask();
       this.#known.clear();
       for (const { id, no_signal: lost } of camera) {
         if (lost) this.#known.set(id, { sinceMs: lost.since * 1000, cause: causeText(lost.cause) });

@@ -6,7 +6,8 @@ import { kMaxQueuedFrames } from "../../../client/src/live/frame_gate";
 import type { LiveSource } from "../../../client/src/live/source";
 import { NewestFrame, StreamSource } from "../../../client/src/live/stream_source";
 import { VideoPlayer } from "../../../client/src/live/video_player";
-import { ServerError, type Camera, type Server } from "../../../client/src/wire/server";
+import type { Camera } from "../../../client/src/wire/camera";
+import { ServerError, type Server } from "../../../client/src/wire/server";
 import { bytes } from "../support/bytes";
 
 test("pictures that come while one is being decoded give way to the newest; a bad one stops nothing", async () => {

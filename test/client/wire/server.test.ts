@@ -2,7 +2,8 @@
 //
 // Answers of the server as the user gets to see them, and what is sent to it.
 
-import { Server, type Camera } from "../../../client/src/wire/server";
+import type { Camera } from "../../../client/src/wire/camera";
+import { Server } from "../../../client/src/wire/server";
 
 const json = (status: number, body: unknown) =>
   new Response(JSON.stringify(body), { status, headers: { "Content-Type": "application/json" } });

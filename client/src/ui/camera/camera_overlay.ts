@@ -2,7 +2,8 @@
 //
 // What covers a screen that shows cameras: the large view of one of them, and the dialog with a snapshot.
 
-import type { Camera, Server } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
+import type { Server } from "../../wire/server";
 import type { KeyList } from "../widgets/keys_dialog";
 import { titleCover } from "../widgets/title";
 import { LargeView } from "./large_view";

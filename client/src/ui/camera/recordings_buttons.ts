@@ -2,7 +2,7 @@
 //
 // Buttons from a camera's live picture to its recordings.
 
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import { cameraAddress } from "../screens/events_route";
 import { iconButton } from "../widgets/button";
 

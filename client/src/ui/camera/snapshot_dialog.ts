@@ -2,7 +2,8 @@
 //
 // Takes a snapshot, shows it and offers it as a file.
 
-import { ServerError, type Camera, type Server, type Snapshot } from "../../wire/server";
+import type { Camera, Snapshot } from "../../wire/camera";
+import { ServerError, type Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { draw, element } from "../widgets/dom";
 import { icon } from "../widgets/icons";

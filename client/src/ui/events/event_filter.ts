@@ -6,7 +6,7 @@ import { kEventKinds, kindOf, type EventKind } from "../../playback/coverage";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
 import type { CameraGroup } from "../../wire/recordings";
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { kKindNames } from "./event_list";

@@ -4,7 +4,8 @@
 
 import type { ExportPlan, Exports } from "../../wire/exports";
 import type { Footage } from "../../wire/footage";
-import { ServerError, type Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
+import { ServerError } from "../../wire/server";
 import type { Span } from "../timeline/span_handles";
 import { bytesText } from "../widgets/amounts";
 import { iconButton } from "../widgets/button";

@@ -9,7 +9,7 @@ import { RecordedDays } from "../../playback/recorded_days";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
 import type { Recordings } from "../../wire/recordings";
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import { spanText } from "../timeline/time_scale";
 import { Timeline, type TimelineActions } from "../timeline/timeline";
 import { Calendar } from "./calendar";

@@ -2,7 +2,7 @@
 //
 // A cell of the stage without a camera, in which the user chooses one.
 
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import { element } from "../widgets/dom";
 
 /** `cameras`: those that may be chosen. `full` says why none may; empty where one may. */

@@ -3,7 +3,8 @@
 // One e-map at a time: its picture with what is placed on it, its editor, and over it a camera that was opened there.
 
 import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem, type ViewerMap } from "../../wire/emaps";
-import { asServerError, type Camera, type ServerError } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
+import { asServerError, type ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { MapCard } from "../map/map_card";
 import { kEditorKeys, MapEditor } from "../map/map_editor";

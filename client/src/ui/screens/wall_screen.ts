@@ -4,7 +4,8 @@
 
 import { missingDecoder } from "../../live/unplayable";
 import { Recordings } from "../../wire/recordings";
-import { kVideoTypeMjpeg, ServerError, type Camera, type CameraList } from "../../wire/server";
+import { kVideoTypeMjpeg, type Camera, type CameraList } from "../../wire/camera";
+import { ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { unplayableHint } from "../camera/unplayable_hint";
 import type { AbsentCameras } from "../wall/absent_cameras";

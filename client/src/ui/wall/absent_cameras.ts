@@ -3,7 +3,7 @@
 // Cameras that were on the wall and that the server no longer lists, and why: their tiles stay, grey, until the user
 // takes them off. A camera that vanishes without a word would be missed by nobody.
 
-import type { Camera, CameraList } from "../../wire/server";
+import type { Camera, CameraList } from "../../wire/camera";
 
 export interface AbsentCamera {
   readonly camera: Camera;

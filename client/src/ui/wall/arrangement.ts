@@ -4,7 +4,7 @@
 // until another is shown.
 
 import type { Preferences } from "../../wire/preferences";
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import type { TileOrder } from "./grid";
 import { kLayoutChoices, type LayoutChoice } from "./layout";
 import type { SavedLayout } from "./saved_layouts";

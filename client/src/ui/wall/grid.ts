@@ -9,7 +9,8 @@
 import { chooseStreams, streamLimit } from "../../live/stream_budget";
 import { protocol } from "../../wire/protocol";
 import { Semaphore } from "../../wire/semaphore";
-import type { Camera, Server } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
+import type { Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import type { AbsentCamera } from "./absent_cameras";
 import { arrange, type LayoutChoice } from "./layout";

@@ -5,7 +5,7 @@
 
 import type { Preferences } from "../../wire/preferences";
 import type { CameraGroup } from "../../wire/recordings";
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import type { OpenWall } from "../screens/route";
 import { Arrangement } from "./arrangement";
 import { SavedLayouts, type SavedLayout } from "./saved_layouts";

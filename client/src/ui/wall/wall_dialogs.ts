@@ -2,7 +2,7 @@
 //
 // The dialogs in which layouts and sequences are saved, changed and deleted.
 
-import type { Camera } from "../../wire/server";
+import type { Camera } from "../../wire/camera";
 import { element } from "../widgets/dom";
 import { chipsField, numberField, textField } from "../widgets/fields";
 import { openDialog } from "../widgets/form_dialog";

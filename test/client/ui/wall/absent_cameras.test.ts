@@ -3,7 +3,7 @@
 // Why a camera that was on the wall is not listed any more.
 
 import { AbsentCameras } from "../../../../client/src/ui/wall/absent_cameras";
-import type { Camera, CameraList } from "../../../../client/src/wire/server";
+import type { Camera, CameraList } from "../../../../client/src/wire/camera";
 
 /** Of cameras with these ids, `CamNum` that there are, those that are disabled included. */
 function listed(ids: number[], CamNum: number, isManager = true): CameraList {

@@ -4,7 +4,7 @@
 
 import { Arrangement } from "../../../../client/src/ui/wall/arrangement";
 import type { Preferences } from "../../../../client/src/wire/preferences";
-import type { Camera } from "../../../../client/src/wire/server";
+import type { Camera } from "../../../../client/src/wire/camera";
 
 const cameras = (...ids: number[]) => ids.map((id) => ({ id }) as Camera);
 

@@ -3,7 +3,8 @@
 // One camera in the list of cameras: its picture, its state, what it sends and when it is recorded.
 
 import type { CameraRecord, Named } from "../../../wire/camera_setup";
-import { kVideoTypeMjpeg, type Server } from "../../../wire/server";
+import { kVideoTypeMjpeg } from "../../../wire/camera";
+import type { Server } from "../../../wire/server";
 import { causeText } from "../../../wire/signal_losses";
 import { settingsAddress } from "../../screens/route";
 import { bytesText } from "../../widgets/amounts";
