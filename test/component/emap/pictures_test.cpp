@@ -58,7 +58,7 @@ TEST_P(PicturesTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
     pictures_.Withdraw(unused);
     pictures_.Withdraw(first);
     EXPECT_THROW(pictures_.Read(unused), std::system_error);
-    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "a map has it";
+    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "a map uses it";
     namespace fs = std::filesystem;
     const auto make_old = [&] {
         fs::last_write_time(folder_ / "emaps" / first, fs::file_time_type::clock::now() - std::chrono::hours(1));
@@ -67,7 +67,7 @@ TEST_P(PicturesTest, AMapsPictureIsReplacedWholeAndNothingElseIsRead) {
     make_old();
     Put(map, "\xff\xd8\xff\xe0");
     EXPECT_NE(emaps_.Find(map)->image, first);
-    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "whoever has just been told of it";
+    EXPECT_EQ(pictures_.Read(first), "<svg/>") << "a client that has just read its name may still load it";
     make_old();
     Put(map, "\xff\xd8\xff\xe0");
     EXPECT_FALSE(fs::exists(folder_ / "emaps" / first));
@@ -100,11 +100,11 @@ TEST_P(PicturesTest, HostsOfOneStoreHaveEachOthersPictures) {
     EXPECT_EQ(can_read(first, png), is_shared);
     other.Withdraw(first);
     other.Sweep();
-    EXPECT_EQ(can_read(first, png), is_shared) << "a map has it";
+    EXPECT_EQ(can_read(first, png), is_shared) << "a map uses it";
 
-    Force("delete from emap_pictures");  // as before the host had others
+    Force("delete from emap_pictures");  // as on a host that was alone until now
     other.Share();
-    EXPECT_FALSE(can_read(first, png)) << "nobody gave it";
+    EXPECT_FALSE(can_read(first, png)) << "its host has not shared it";
     pictures_.Share();
     pictures_.Share();
     EXPECT_EQ(can_read(first, png), is_shared);
@@ -112,10 +112,10 @@ TEST_P(PicturesTest, HostsOfOneStoreHaveEachOthersPictures) {
 
     Force("update emap_pictures set touched_s = touched_s - 3600");
     Put(map, "\xff\xd8\xff\xe0");
-    EXPECT_EQ(can_read(first, png), is_shared) << "whoever has just been told of it";
+    EXPECT_EQ(can_read(first, png), is_shared) << "a client that has just read its name may still load it";
     Force("update emap_pictures set touched_s = touched_s - 3600");
     other.Sweep();
-    EXPECT_FALSE(can_read(first, png)) << "no map has it any more";
+    EXPECT_FALSE(can_read(first, png)) << "no map uses it any more";
     const std::string second = emaps_.Find(map)->image;
     EXPECT_EQ(can_read(second, "\xff\xd8\xff\xe0"), is_shared);
 

@@ -17,7 +17,7 @@ using testing::ElementsAre;
 using testing::Field;
 using testing::IsEmpty;
 
-class PlaceTest : public StoreTest {
+class MountsAndGroupsTest : public StoreTest {
   protected:
     int AddMount(const std::string& name, const std::string& path) { return mounts_.Add({.name = name, .path = path}); }
 
@@ -27,7 +27,7 @@ class PlaceTest : public StoreTest {
     Users users_{store_};
 };
 
-TEST_P(PlaceTest, OneMountIsTheDefaultAndNoneLiesInAnother) {
+TEST_P(MountsAndGroupsTest, OneMountIsTheDefaultAndNoneLiesInAnother) {
     EXPECT_FALSE(mounts_.FindForPlan(0));
     const int first = AddMount("first", "/srv/a");
     EXPECT_THAT(mounts_.List(), ElementsAre(Field(&Mount::is_default, true)));
@@ -57,7 +57,7 @@ TEST_P(PlaceTest, OneMountIsTheDefaultAndNoneLiesInAnother) {
     EXPECT_EQ(mounts_.List().size(), 2U);
 }
 
-TEST_P(PlaceTest, AMountInUseIsNotForgottenByMistake) {
+TEST_P(MountsAndGroupsTest, AMountInUseIsNotForgottenByMistake) {
     const int camera = AddCamera();
     const int normal = AddMount("normal", "/srv/a");
     const int other = AddMount("other", "/srv/b");
@@ -84,7 +84,7 @@ TEST_P(PlaceTest, AMountInUseIsNotForgottenByMistake) {
     EXPECT_EQ(AddMount("other", "/srv/b"), other + 1) << "events on a disk in a drawer keep their mount's id";
 }
 
-TEST_P(PlaceTest, PlansAreKeptPerCameraAndRefusedWhenTheyBreakARule) {
+TEST_P(MountsAndGroupsTest, PlansAreKeptPerCameraAndRefusedWhenTheyBreakARule) {
     const int camera = AddCamera();
     const int mount = AddMount("first", "/srv/a");
     EXPECT_EQ(plans_.Find(camera).segment_s, 300) << "without one of its own";
@@ -115,7 +115,7 @@ TEST_P(PlaceTest, PlansAreKeptPerCameraAndRefusedWhenTheyBreakARule) {
     EXPECT_THAT(plans_.List(), IsEmpty());
 }
 
-TEST_P(PlaceTest, WhatIsDeniedOfAGroupIsDeniedOfItsCameras) {
+TEST_P(MountsAndGroupsTest, WhatIsDeniedOfAGroupIsDeniedOfItsCameras) {
     const std::set<int> cameras = {AddCamera(), AddCamera(), AddCamera()};
     const int yard = groups_.Add({.name = "Yard", .camera_ids = {1, 2}});
     const int user = users_.Add("bob", "correct horse", Privilege::kViewer).id;
@@ -152,7 +152,7 @@ TEST_P(PlaceTest, WhatIsDeniedOfAGroupIsDeniedOfItsCameras) {
     EXPECT_THROW(groups_.Remove(yard), NotFound);
 }
 
-TEST_P(PlaceTest, WhatMayNotBePlayedIsNotExportedEither) {
+TEST_P(MountsAndGroupsTest, WhatMayNotBePlayedIsNotExportedEither) {
     const int id = users_.Add("bob", "correct horse", Privilege::kViewer).id;
     users_.Deny(id, 2);
     users_.Allow(id, 2, {CameraAccess::kPlayback});
@@ -164,7 +164,7 @@ TEST_P(PlaceTest, WhatMayNotBePlayedIsNotExportedEither) {
     EXPECT_THAT(users_.DeniedCameras(id, CameraAccess::kExport), ElementsAre(2, 6));
 }
 
-TEST_P(PlaceTest, GroupsKeepCamerasThatWereRemovedAndTakeNoUnknownOnes) {
+TEST_P(MountsAndGroupsTest, GroupsKeepCamerasThatWereRemovedAndTakeNoUnknownOnes) {
     AddCamera();
     AddCamera();
     const int yard = groups_.Add({.name = "Hof 門", .camera_ids = {1, 2}});
@@ -181,7 +181,7 @@ TEST_P(PlaceTest, GroupsKeepCamerasThatWereRemovedAndTakeNoUnknownOnes) {
     EXPECT_EQ(groups_.List().size(), 2U);
 }
 
-LOOKHAVEN_ON_BOTH_ENGINES(PlaceTest);
+LOOKHAVEN_ON_BOTH_ENGINES(MountsAndGroupsTest);
 
 }  // namespace
 }  // namespace lookhaven::store
