@@ -22,6 +22,7 @@ sys.path[:0] = [str(ROOT / "test/system"), str(ROOT / "bench")]
 from installation import LIVE, PASSWORDS, Installation, children, program, wait_until  # noqa: E402
 from postgres import Postgres  # noqa: E402
 from environment import RESTART_S, Clock, Watcher, last_frame_s, player_files  # noqa: E402
+from small_disk import SmallDisk  # noqa: E402
 from players import playing  # noqa: E402
 
 MAX_LOST_S = 1.0  # of footage, by a killed recorder
@@ -34,13 +35,13 @@ class Torture:
         self.counts, self.lost, self.recorders = collections.Counter(), [], {server.part("recorder")}
         self._decoded = set()
         self.camera = self._add_camera("Tortured", server.cli("mount", "list", "--json"))
-        self.disk = pathlib.Path(f"{server._folder.name}/disk")
-        self.disk.mkdir(mode=0o777)
+        self._recorded = {self.camera}
+        self.disk = None
         if os.geteuid() == 0:
-            self._mount_disk()
-            self.cli("mount", "add", "--name", "Small disk", str(self.disk))
-            self.small = self._add_camera("On the small disk", server.cli("mount", "list", "--json"))
-        self._recorded = {self.camera, self.small} if os.geteuid() == 0 else {self.camera}
+            self.disk = SmallDisk(server)
+            self.cli("mount", "add", "--name", "Small disk", str(self.disk.path))
+            self.disk.camera = self._add_camera("On the small disk", server.cli("mount", "list", "--json"))
+            self._recorded.add(self.disk.camera)
         self.watcher = Watcher(server, self.camera)
         self.watcher.sees_more()
 
@@ -53,11 +54,6 @@ class Torture:
         camera = self.cli("camera", "add", "--enable", "--name", name, "--source", "test:mjpeg", "--record", "always",
                           "--segment", "10s", "--mount", mount, "--json")
         return json.loads(camera)["id"]
-
-    def _mount_disk(self):
-        owner = self.server.home.stat()
-        options = f"size=48m,uid={owner.st_uid},gid={owner.st_gid}"
-        subprocess.run(["mount", "-t", "tmpfs", "-o", options, "tmpfs", self.disk], check=True)
 
     def recordings(self):
         return sorted(self.server.home.glob(f"recordings/{self.camera}/*/*.mkv"), key=lambda path: path.stat().st_mtime)
@@ -162,41 +158,6 @@ class Torture:
         assert abs(self.clock.now_s() - last_frame_s(recording)) < 5, f"{recording} has another time"
         assert all(path.exists() for path in kept), "a step of the clock deleted footage"
 
-    def fill_disk(self):
-        with contextlib.suppress(OSError), open(self.disk / "filler", "wb") as filler:
-            while True:
-                filler.write(bytes(1 << 20))
-        time.sleep(random.uniform(0.5, 3))
-        (self.disk / "filler").unlink()
-
-    def remount_disk_read_only(self):
-        """Laid over itself: the kernel refuses to write-protect a file system while a file on it is open for writing. So
-        the recorder notices with its next file, or, on a full disk, with the next one that retention is to remove."""
-        subprocess.run(["mount", "--bind", self.disk, self.disk], check=True)
-        try:
-            subprocess.run(["mount", "-o", "remount,bind,ro", self.disk], check=True)
-            assert os.statvfs(self.disk).f_flag & os.ST_RDONLY, "the disk can be written"
-            wait_until(self._is_found_read_only, 60, "the recorder finds the disk read-only")
-        finally:
-            subprocess.run(["umount", "--lazy", self.disk], check=True)
-
-    def unplug_disk(self):
-        """Away, with all that is on it, and another one in its place."""
-        subprocess.run(["mount", "--move", self.disk, self._parking()], check=True)
-        time.sleep(random.uniform(0.5, 3))
-        subprocess.run(["mount", "--move", self._parking(), self.disk], check=True)
-
-    def _parking(self):
-        parking = self.disk.with_name("parking")
-        parking.mkdir(exist_ok=True)
-        return parking
-
-    def _is_found_read_only(self):
-        run = self.server.home / "run"
-        states = [line.split()[:2] for line in (run / "recordings").read_text().splitlines()]
-        is_full = [str(self.small), "disk-full"] in states
-        return [str(self.small), "disk-fails"] in states or is_full and "Read-only" in (run / "mounts").read_text()
-
     # --- what must hold
 
     def check(self):
@@ -228,17 +189,16 @@ class Torture:
 
     def close(self):
         self.watcher.close()
-        for folder in (self.disk, self._parking()):
-            if os.path.ismount(folder):
-                subprocess.run(["umount", "--lazy", folder], check=True)
+        if self.disk is not None:
+            self.disk.close()
 
 
 def run(torture, seconds):
     """For that long; 0: does everything once."""
     actions = [torture.kill_recorder, torture.kill_request, torture.kill_player, torture.cut_clients, torture.kill_host,
                torture.kill_web_server, torture.hang_recorder, torture.lose_store, torture.step_clock]
-    if os.geteuid() == 0:
-        actions += [torture.fill_disk, torture.remount_disk_read_only, torture.unplug_disk]
+    if torture.disk is not None:
+        actions += [torture.disk.fill_disk, torture.disk.remount_disk_read_only, torture.disk.unplug_disk]
     if seconds:
         actions += [torture.kill_recorder] * 11 + [torture.kill_request, torture.cut_clients]
     before = torture.descriptors()
