@@ -144,10 +144,10 @@ TEST_P(CameraChangeTest, AnOrderIsChangedByWhoHasSeenIt) {
     EXPECT_EQ(order(), second);
     EXPECT_EQ(OrderCameras(store_, {}, second["revision"].asInt64(), ids), first);
     const int added = AddGate();
-    EXPECT_TRUE(is_stale(first)) << "a camera came";
+    EXPECT_TRUE(is_stale(first)) << "a camera was added";
     RemoveCamera(store_, {}, added, {}, Footage::kKeep);
     EXPECT_TRUE(is_stale(second));
-    EXPECT_FALSE(is_stale(first)) << "it is that order again";
+    EXPECT_FALSE(is_stale(first)) << "the order is as it was again";
 }
 
 TEST_P(CameraChangeTest, TheLogTellsWhatChangedButNoPassword) {
@@ -217,7 +217,7 @@ TEST_P(CameraChangeTest, FootageGoesWithItsCameraWhereThatIsWanted) {
     removals.BeginDeletions();
     EXPECT_TRUE(events.Find(its)) << "whatever is remembered, what a camera has stays while it is there";
     removals.Add(9, 2 * base::WallSeconds());
-    EXPECT_EQ(removals.Cameras(), std::vector<int>{9}) << "those of long ago are forgotten";
+    EXPECT_EQ(removals.Cameras(), std::vector<int>{9}) << "old ones are deleted";
 }
 
 TEST_P(CameraChangeTest, AHostHasAThousandCamerasAtMost) {
@@ -236,7 +236,7 @@ TEST_P(CameraChangeTest, IsForManagersHereToo) {
     const int id = AddGate();
     const std::function<void()> changes[] = {
         [&] { admin::AddCamera(store_, viewer, kinds_, Gate()); },
-        [&] { SetCamera(store_, viewer, kinds_, id, {}, [](CameraSetup&) { FAIL() << "nothing is looked at"; }); },
+        [&] { SetCamera(store_, viewer, kinds_, id, {}, [](CameraSetup&) { FAIL() << "called for a viewer"; }); },
         [&] { RemoveCamera(store_, viewer, id, {}, Footage::kRemove); },
         [&] { OrderCameras(store_, viewer, {}, {id}); },
     };

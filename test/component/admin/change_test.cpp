@@ -79,7 +79,7 @@ TEST_P(ChangeTest, OfAStaleRecordIsToldTheCurrentOne) {
     } catch (const Stale& stale) {
         EXPECT_EQ(stale.Record(), record);
     }
-    EXPECT_EQ(RevisionOf(record), record["revision"].asInt64()) << "which is no part of what it tells of";
+    EXPECT_EQ(RevisionOf(record), record["revision"].asInt64()) << "the revision does not cover itself";
     EXPECT_LT(RevisionOf(record), std::int64_t{1} << 48);
 }
 

@@ -116,7 +116,7 @@ TEST_F(Admission, FewPasswordsAreHashedAtOnce) {
     std::ranges::generate(attempts, [&, n = 100]() mutable { return attempt(++n); });
     attempts.clear();
     EXPECT_TRUE(host::Eventually(std::chrono::seconds(15), [&] { return host_.RequestProcesses() == 0; }));
-    EXPECT_EQ(Status(login, false, "account=admin&password=right+password"), 200) << "what was cut off gives way";
+    EXPECT_EQ(Status(login, false, "account=admin&password=right+password"), 200) << "clients that left make room";
 }
 
 TEST_F(Admission, WhoIsLoggedInKeepsNobodyFromLoggingIn) {

@@ -109,7 +109,7 @@ TEST_F(WatchApi, GoesOnWhereTheClientWasWithoutLossOrRepetition) {
     const std::string told = first.Place();
     const int hidden = Report(3, "hidden");
     EXPECT_FALSE(Watcher(host_, viewer_, std::to_string(hidden) + '-' + std::to_string(now_s)).IsResumed())
-        << "as one that there is not";
+        << "as for an event that does not exist";
     Report(1, "c");
     const std::string yesterday = std::to_string(now_s - 90'000);
     const std::string id = told.substr(0, told.find('-'));
@@ -137,7 +137,7 @@ TEST_F(WatchApi, GoesOnWhereTheClientWasWithoutLossOrRepetition) {
     store::Mark mark;
     mark.camera_id = 1, mark.start_s = mark.end_s = mark.moment_s = mark.reported_s = now_s;
     store::Marks(footage_.Records()).AddAll(std::vector(1'001, mark));
-    EXPECT_FALSE(Watcher(host_, viewer_, told).IsResumed()) << "more than is told anew";
+    EXPECT_FALSE(Watcher(host_, viewer_, told).IsResumed()) << "more reports than are repeated";
     for (const char* bad : {"x", "5", "-5-5", "5-", "5-x", "5-5x", "99999999999-5"}) {
         EXPECT_EQ(Ask(std::string("Event&version=1&method=Watch&after=") + bad).status, 400) << bad;
     }

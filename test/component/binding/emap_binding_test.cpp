@@ -143,7 +143,7 @@ TEST_F(EmapBinding, DevicesAreFoundByTheirIdHereAndByTheirIdOnTheirServer) {
     ASSERT_EQ(pos.LoadByIdOnRecServer(6, 1), 0);
     EXPECT_EQ(pos.GetPairedCamIdOnRec(), 0) << "a camera that the terminal's server does not know";
     ASSERT_EQ(pos.Load(devices_.Add({.kind = EmapItemType::kPos, .name = "Own terminal", .camera_id = 2})), 0);
-    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 2) << "whosever the camera is, it has an id here";
+    EXPECT_EQ(pos.GetPairedCamIdOnRec(), 2) << "a paired host's camera has an id of this host, too";
 
     EXPECT_EQ(GetCamIdOnHost(1, 1), 2);
     EXPECT_EQ(GetCamIdOnHost(1, 2), 0);
@@ -208,7 +208,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     EXPECT_EQ(cookie.find(kSecret), std::string::npos);
     const std::string token = cookie.substr(timestamp.size() + 1);
     EXPECT_EQ(token, remote::MakePairToken(kSecret, timestamp));
-    EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "what is shown to another host opens nothing here";
+    EXPECT_FALSE(IsAuthPairMatch(token, timestamp)) << "a token for another host is not valid here";
     for (const unsigned int caller : {2U, static_cast<unsigned int>(PAIR_AUTH_UID)}) {
         Call(caller);
         EXPECT_EQ(SlaveHxMgr(true).GetSlaveHxMap(true, true, true).at(1).GetCookie(), "") << caller;
@@ -220,7 +220,7 @@ TEST_F(EmapBinding, AHostManagesOthersWhenItIsToldToAndProvesItselfToThem) {
     EXPECT_EQ(RequestContext::Current().Caller(), 1U);
     EXPECT_TRUE(
         SlaveHxAuthentication().IsAuthByPairMatch(remote::MakePairToken(std::string(64, 'd'), timestamp), timestamp));
-    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "who is matched acts as the paired host";
+    EXPECT_EQ(RequestContext::Current().Caller(), PAIR_AUTH_UID) << "acts as the paired host";
 }
 
 }  // namespace

@@ -45,7 +45,7 @@ class SetupAddress : public CliTest {
 TEST_F(SetupAddress, IsThatOfTheWebServerAndTheNewestAloneIsValid) {
     const std::string bare = Run("setup-address").text;
     EXPECT_EQ(TokenIn(bare), "valid");
-    EXPECT_THAT(bare, Not(HasSubstr("http"))) << "nobody knows where";
+    EXPECT_THAT(bare, Not(HasSubstr("http"))) << "the address is not known";
     std::ofstream(home_ / "run/nginx.conf") << "    listen 127.0.0.1:8181 sndbuf=192k;\n"
                                                "    listen 8543 ssl http2 sndbuf=192k;\n"
                                                "    listen [::]:8543 ssl http2 ipv6only=on sndbuf=192k;\n";
@@ -107,7 +107,7 @@ TEST_F(SetupAddress, IsRefusedOnceThereIsAnAccount) {
     EXPECT_EQ(Run("setup-address", "", true).code, 77) << "another user of this machine";
     EXPECT_THAT(Run("user add ada --privilege owner", "ada-s3cret\n").text, HasSubstr("Added"));
     Play({{"setup-address", 65, "there is an account already"}, {"setup-address --if-needed", 0, "", "#"}});
-    EXPECT_FALSE(std::filesystem::exists(file_)) << "what it holds is void";
+    EXPECT_FALSE(std::filesystem::exists(file_)) << "the token is not valid any more";
     EXPECT_THAT(Run("init").text, Not(HasSubstr("setup-address")));
 }
 

@@ -57,7 +57,7 @@ TEST_F(ProgressFileTest, PassesToTheNewerPlayer) {
     }));
     EXPECT_FALSE(older->Set(9));
     EXPECT_EQ(older->Get(), ProgressFile::kUnset);
-    EXPECT_FALSE(client->Set(9)) << "meant the older one";
+    EXPECT_FALSE(client->Set(9)) << "it was for the older player";
     EXPECT_EQ(ProgressFile::Open(folder_, 7, "aa")->Get(), 2);
     ProgressFile::Sweep(folder_, 7, "aa", getpid());
     EXPECT_TRUE(Exists(7)) << "not its own any more";

@@ -133,7 +133,7 @@ TEST(SlotTable, RequestsForAPlayerDoNotReachItsSuccessor) {
     ASSERT_EQ(second.slot, first.slot);
     table.End(second);
     table.End(first);
-    EXPECT_TRUE(second.slot->MustEnd()) << "a late mark takes no newer one away";
+    EXPECT_TRUE(second.slot->MustEnd()) << "a late End of its predecessor does not undo it";
     table.Free(*second.slot);
     const RequestRef third = play();
     table.End(first);

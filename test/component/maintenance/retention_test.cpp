@@ -39,7 +39,7 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     EXPECT_FALSE(fs::exists(footage_.Mount() / "2")) << "a camera without recordings leaves no folder";
     std::vector<unsigned char> log(120);
     ASSERT_TRUE(archive::ReadRecordingLog(footage_.Mount() / "1", kNoon + 100, log));
-    EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "what is gone is not said to be there";
+    EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "no footage is logged for deleted recordings";
     EXPECT_EQ(std::count(log.begin() + 60, log.end(), 0), 0);
 }
 

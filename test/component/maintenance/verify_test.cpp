@@ -146,7 +146,7 @@ TEST_F(VerifyTest, FindsAndRepairsEachKindOfDamage) {
         Age();
         const auto damaged = State();
         const VerifyReport found = Verify(Records(), false);
-        EXPECT_EQ(State(), damaged) << "looking changed something";
+        EXPECT_EQ(State(), damaged) << "verify without --repair changed something";
         const VerifyReport repaired = Verify(Records(), true);
         ASSERT_EQ(found.faults.empty(), *each.problem == '\0');
         if (!found.faults.empty()) {
@@ -210,7 +210,7 @@ TEST_F(VerifyTest, AForeignNumberIsGivenAnotherAndADiskThatIsAwayIsLeftAlone) {
     EXPECT_THAT(Verify(Records(), true).faults.front().done, HasSubstr("imported"));
     EXPECT_TRUE(fs::exists(in_reserve) && events.Find(reserved)) << "nobody else can have its number";
     EXPECT_TRUE(std::ranges::is_sorted(events.InRecordingOrder(footage_.MountId(), {}, 9), {}, &store::Event::start_s))
-        << "a new number makes no recording younger";
+        << "a new id does not change the order of recording";
     EXPECT_THAT(Verify(Records(), false).faults, testing::IsEmpty());
     store::Camera camera;
     camera.name = "New";
@@ -261,7 +261,7 @@ TEST_F(VerifyTest, AFolderThatCannotBeReadEndsTheWorkOnItsMountAndLosesNothing) 
             ASSERT_FALSE(faults.empty());
             EXPECT_THAT(faults.back().problem, HasSubstr("was not checked further: "));
             EXPECT_THAT(faults.back().problem, HasSubstr("Permission denied"));
-            EXPECT_EQ(repair, faults.size() == 1) << "repair stops at the first, a look goes on";
+            EXPECT_EQ(repair, faults.size() == 1) << "repair stops at the first failure, a check goes on";
             fs::permissions(row.folder, fs::perms(0777));
             EXPECT_TRUE(State() == before) << (repair ? "repair" : "look");
             fs::permissions(row.folder, row.left);

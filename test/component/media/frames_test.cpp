@@ -42,7 +42,7 @@ TEST(ParameterSets, StandBeforeEveryKeyFrame) {
             flood += set + std::to_string(i + 1'000'000);
         }
         const std::clock_t begin = std::clock();
-        EXPECT_EQ(h264.Complete(Bytes(flood + idr)).size(), 12 + flood.size() + idr.size()) << "no sets of a camera";
+        EXPECT_EQ(h264.Complete(Bytes(flood + idr)).size(), 12 + flood.size() + idr.size()) << "too large for sets";
         EXPECT_LT(std::clock() - begin, CLOCKS_PER_SEC);
     }
     ParameterSets h265(Codec::kH265, {});
@@ -101,7 +101,7 @@ TEST(JpegSize, ReadsHeadersOfAnyKind) {
     }
     EXPECT_EQ(size_of("\xff\xd8\xff\xff\xc2" + std::string("\0\x11\x08\0\x10\0\x20", 7)), "32x16")
         << "fill bytes, progressive";
-    EXPECT_EQ(size_of(std::string("\xff\xd8\xff\xe0\0\0\xff\xe0\0\0\0\0\0\0", 14)), "none") << "lengths of nothing";
+    EXPECT_EQ(size_of(std::string("\xff\xd8\xff\xe0\0\0\xff\xe0\0\0\0\0\0\0", 14)), "none") << "segments of length 0";
     EXPECT_EQ(size_of("GIF89a and more"), "none");
     const std::pair<std::string, const char*> bounds[] = {
         {std::string("\x20\0\x20\0", 4), "8192x8192"}, {std::string("\x20\1\0\1", 4), "none"},

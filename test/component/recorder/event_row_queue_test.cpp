@@ -67,10 +67,10 @@ TEST_F(EventRowQueueTest, OnlyWhatIsInTheStoreIsSaidToBe) {
     rows_->Put(growing);
     rows_->NoteWritten(1, 2000);
     rows_->Refresh(1);
-    EXPECT_FALSE(rows_->HasStored(1, 1001 - kDelayS)) << "the store is away";
+    EXPECT_FALSE(rows_->HasStored(1, 1001 - kDelayS)) << "the store is unavailable";
     Sql("alter table away rename to events");
     EXPECT_TRUE(BecomesStored(1, 2000 - kDelayS));
-    EXPECT_TRUE(store::Events(*store_).Find(growing.id)) << "said before it was so";
+    EXPECT_TRUE(store::Events(*store_).Find(growing.id)) << "reported as stored before it was";
     EXPECT_TRUE(rows_->HasUnstored(1)) << "it is still to be finished";
 
     growing.recording = false;
@@ -92,7 +92,7 @@ TEST_F(EventRowQueueTest, ARowThatVerifyHasImportedMeanwhileGetsItsLastState) {
     rows_->Put(row);
     rows_->NoteWritten(1, 2000);
     EXPECT_TRUE(BecomesStored(1, 2000 - kDelayS));
-    EXPECT_EQ(store::Events(*store_).Find(row.id)->frame_count, 250) << "said before it was so";
+    EXPECT_EQ(store::Events(*store_).Find(row.id)->frame_count, 250) << "reported as stored before it was";
     EXPECT_FALSE(rows_->HasUnstored(1));
 }
 

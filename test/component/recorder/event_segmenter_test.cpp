@@ -222,7 +222,7 @@ TEST_F(EventSegmenterTest, AnEventGoesOnWhileThereIsNoIdForTheNext) {
 
 TEST_F(EventSegmenterTest, WhatStopsRecordingIsAStateOutOfWhichItFinds) {
     Pass(2);
-    EXPECT_EQ(segmenter_.State(), RecordingState::kNoEventId) << "the store has not been there yet";
+    EXPECT_EQ(segmenter_.State(), RecordingState::kNoEventId) << "the store has not been reached yet";
     OpenStore();
     const auto is_recorded_again = [&] {
         fed_ = 0;

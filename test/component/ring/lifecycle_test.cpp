@@ -66,7 +66,7 @@ TEST_F(LifecycleTest, ARestartedRecorderAdoptsTheRingUnderItsReaders) {
         EXPECT_EQ(ReadNext(ring, 102, &position), nullptr);
         EXPECT_FALSE(IsRetired(ring));
     }
-    EXPECT_TRUE(IsRetired(ring)) << "the orderly end";
+    EXPECT_TRUE(IsRetired(ring)) << "after a clean stop";
     EXPECT_EQ(Attach(installation_, kId), nullptr);
     EXPECT_EQ(ReadLatest(ring, 102, &position), nullptr);
     Detach(ring);

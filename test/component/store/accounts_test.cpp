@@ -265,7 +265,7 @@ TEST_P(AccountTest, GuessingIsSlowedDownPerAccountAndAddress) {
         EXPECT_EQ(throttle.Enter(row.account, row.address, kNow + row.at_s), row.wait_s) << row.at_s << row.account;
     }
     for (int i = 0; i < 20; ++i) {
-        EXPECT_EQ(throttle.Enter("eve", "::1", kNow + 200), 0) << "right passwords do not add up";
+        EXPECT_EQ(throttle.Enter("eve", "::1", kNow + 200), 0) << "successful log-ins do not count";
         throttle.Clear("eve", "::1");
     }
     for (const std::string& text : kHostileTexts) {

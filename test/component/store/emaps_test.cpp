@@ -52,7 +52,7 @@ TEST_P(EmapTest, ItemsComeBackAsTheyWerePutAndOnlyOnTopOfWhatWasRead) {
     EXPECT_EQ(emaps_.ReplaceItems(fresh, {link}), 3);
     EXPECT_TRUE(emaps_.Find(map)->hide_names && emaps_.Find(map)->small_items);
     emaps_.Remove(other);
-    EXPECT_EQ(Replace(map, {link}), 4) << "what lost its target is no reason to refuse a change of the rest";
+    EXPECT_EQ(Replace(map, {link}), 4) << "an item whose target is gone blocks no change of the others";
     EXPECT_THROW(emaps_.ReplaceItems({.id = 99}, {}), NotFound);
     emaps_.Remove(map);
     EXPECT_EQ(Ask("select count(*) from emap_items"), "0");

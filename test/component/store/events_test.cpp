@@ -135,7 +135,7 @@ TEST_P(EventTest, AnEventGrowsUntilItIsFinished) {
         const bool sqlite = GetParam() == Engine::kSqlite;
         std::string setting;
         sql << (sqlite ? "pragma synchronous" : "show synchronous_commit"), soci::into(setting);
-        EXPECT_EQ(setting, sqlite ? "2" : "on") << "growing alone may be lost in a power cut, no change after it";
+        EXPECT_EQ(setting, sqlite ? "2" : "on") << "a power cut may lose growth, no other change";
     });
     EXPECT_EQ(events_.Find(event.id)->end_s, event.start_s + 1);
     EXPECT_EQ(events_.Find(event.id)->size_bytes, 5'000'000'000);

@@ -151,7 +151,7 @@ TEST_P(HostTest, ALeaseOfACameraChangesHandsOnlyAsItWasSeen) {
     RecorderLease(store_, first).Take(0, "a", 1);
     EXPECT_FALSE(leases.Take(held, second, 0)) << "its host's heartbeat has changed";
     EXPECT_TRUE(leases.Take(held, second, 1)) << "it stands still";
-    EXPECT_FALSE(leases.Take(held, first, 0)) << "it has changed hands";
+    EXPECT_FALSE(leases.Take(held, first, 0)) << "the lease has another holder now";
     leases.Release(id, first);
     EXPECT_EQ(hosts_.HostOfCamera(id), second) << "what it has lost it cannot give up";
     leases.Move(id, first);

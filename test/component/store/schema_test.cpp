@@ -110,7 +110,7 @@ TEST_P(EmptyStore, OfTheFirstVersionIsBroughtUpWithItsData) {
     Force("insert into sessions values ('x', 'h', 1, 5, 5, 9)");
     const bool is_copied = GetParam() == Engine::kSqlite;
     const std::filesystem::path cut_off = copy.string() + ".new";
-    std::ofstream(cut_off) << "half of a copy";
+    std::ofstream(cut_off) << "an incomplete copy";
     std::ofstream(cut_off.string() + "-wal") << "half of a log";
     EXPECT_EQ(Store::CopyIfOlder(url_, folder_), is_copied);
     EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - 1);
