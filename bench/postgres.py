@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
-"""A PostgreSQL server of one's own, and a standby of it, for as long as a benchmark or a test runs. It refuses to be
-root, so root lends it a user."""
+"""A PostgreSQL server, and a standby of it, for as long as a benchmark or a test runs. It refuses to run as root, so
+root starts it as the user postgres."""
 
 import os
 import pathlib

@@ -113,7 +113,7 @@ void AddHosts(CLI::App& program, const Console& console) {
     group.Add("drain", "Has a host give its cameras to others, and take none", Drain<true>)
         .Option("name", request.name, name, Required);
     group.Add("undrain", "Lets a host take cameras again", Drain<false>).Option("name", request.name, name, Required);
-    group.Add("balance", "Shares the cameras out anew among the hosts", Balance);
+    group.Add("balance", "Distributes the cameras evenly among the hosts", Balance);
     group.Add("remove", "Removes a host; the recordings on its mounts are left as they are", Remove)
         .Option("name", request.name, name, Required)
         .Flag("--yes", request.yes, "Also where its mounts hold recordings, which only that host can still play");

@@ -4,7 +4,8 @@
 // how little it needs), declare its SourceOpener here, and add a row to kNetworkKinds; the compiler asks for the rest.
 // It then runs confined in lookhaven-camera (camera/isolated_source.h), whose confinement must permit what it needs;
 // see docs/design/cameras.md. The command line and the web API take it by themselves; in the web client, kSchemes of
-// ui/settings/cameras/address.ts lists what can be typed.
+// ui/settings/cameras/address.ts lists what can be typed. One of this machine, such as file:, is a row in CameraKinds
+// (source_kinds.cpp), which the recorder itself reads.
 #pragma once
 
 #include <array>

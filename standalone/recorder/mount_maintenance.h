@@ -71,10 +71,10 @@ class MountMaintenance {
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
     const int mount_id_;
-    std::string recovery_failure_;  // of the last attempt; of the thread, as the rest but the status
     const MaintenanceContext context_;
 
     // Only the thread uses these.
+    std::string recovery_failure_;  // of the last attempt
     maintenance::ClockWatch clock_watch_;
     maintenance::MountLock lock_;
     maintenance::DiskWatch disk_watch_;

@@ -101,7 +101,7 @@ class Transfer {
             return "its clock is " + std::to_string(std::abs(ahead_s) / 60) + " minutes " +
                    (ahead_s < 0 ? "behind" : "ahead of") + " this host's: set both right";
         }
-        return "it does not let this host in: it knows another secret, or has ended the pairing; pair the two anew";
+        return "it does not let this host in: it knows another secret, or has ended the pairing; pair the two again";
     }
 
     bool Take(std::span<const char> bytes) {

@@ -44,7 +44,7 @@ class Hosts {
     int Add(const Host& host);
     // Replaces name, address, port, certificate, version and draining of host.id. Throws as Add, and NotFound.
     void Update(const Host& host);
-    // Raise no revision. Nothing happens for an unknown host, or when it is stored so.
+    // Raise no revision. Nothing happens for an unknown host, or when that is stored already.
     void SetVersion(int id, const std::string& version);
     void SetRoom(int id, bool has_room);
     // Removes the record, and gives up its leases; its mounts, with what lies on them, stay, and keep its id. Those of

@@ -5,15 +5,18 @@
 export interface Camera {
   id: number;
   name: string;
+  /** The codec of its live view; `kVideoTypeMjpeg`, or one that the browser decodes. */
   video_type: number;
   liveview_port: number;
+  /** The PTZ abilities that the user may use, as bits. */
   cam_ptz: number;
+  /** 1 when it sends sound. */
   sound_support: number;
   /** The paired host that owns it, where it has this id; absent or 0: this host's own. */
   server?: number;
 }
 
-/** What a picture is asked for with. */
+/** What the request for a picture needs to know. */
 export type StillCamera = Pick<Camera, "id" | "video_type" | "server">;
 
 /** Answer of LoadCamera. */
@@ -27,6 +30,7 @@ export interface CameraList {
   EnableCamNum: number;
 }
 
+/** A single picture, and when it was captured. */
 export interface Snapshot {
   jpeg: Blob;
   /** Unix milliseconds. */

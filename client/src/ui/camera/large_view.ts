@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One camera over the whole window, at the camera's full picture.
+// One camera over the whole window, in the camera's full resolution.
 
 import { AudioPlayer } from "../../live/audio_player";
 import { SnapshotSource } from "../../live/snapshot_source";

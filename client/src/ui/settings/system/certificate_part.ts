@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The server's certificate: what browsers compare it by, until when it holds, and the way to another.
+// The server's certificate: what browsers compare it by, until when it is valid, and how to replace it.
 
 import type { Certificate } from "../../../wire/system";
 import { button } from "../../widgets/button";
