@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the machine charges for that of which a request's process is made: prints the time of a page's first use, of the
-// copy of a page that a forked process writes to, and of a fork. A virtual machine may need fifty times
-// what its host does.
+// What the parts of a request process cost on this machine: prints the time of a page's first use, of the copy of a
+// page that a forked process writes to, and of a fork. A virtual machine may need fifty times what its host does.
 #include <cstddef>
 #include <cstdint>
 #include <iostream>

@@ -1,6 +1,6 @@
 # SPDX-License-Identifier: Apache-2.0
-"""Viewers on slow lines, and such as read slowly, over HTTP and over TLS with HTTP/2: how old the pictures are that
-they see, and whether fast viewers of the same camera notice. Prints two Markdown tables."""
+"""Viewers on slow lines, and viewers that read slowly, over HTTP and over TLS with HTTP/2: how old the pictures are
+that they see, and whether fast viewers of the same camera notice. Prints two Markdown tables."""
 
 import contextlib
 import pathlib

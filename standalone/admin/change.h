@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every change of the installation goes through: the actor is judged, the record that was seen is still the
-// current one, and the audit log tells of it.
+// What every change of the installation goes through: the actor may make it, the record that was seen is still
+// the current one, and the audit log has it.
 #pragma once
 
 #include <cstdint>

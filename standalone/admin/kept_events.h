@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Keeps recordings from retention, or gives them back to it; the audit log tells who did.
+// Protects recordings from retention, and ends that protection; the audit log says who did.
 #pragma once
 
 #include <string>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The installation's own web server, when what it has read has changed.
+// Has the installation's own web server read its changed files.
 #pragma once
 
 #include <stdexcept>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Whether the installation does now what it is there for: pictures come, they reach the disks, the store answers.
+// Whether the installation works at the moment: pictures come, they reach the disks, the store answers.
 //
 // Why so        A monitor asks every few seconds, so only what is cheap is looked at. `lookhaven doctor` looks at
 //               everything, and says what to do.

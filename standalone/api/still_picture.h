@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A picture of a key frame that a camera made, decoded where it can do no harm.
+// Decodes a key frame of a camera into a picture, in a sandbox.
 #pragma once
 
 #include <cstdint>

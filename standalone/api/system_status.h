@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How the installation is, part by part, and what to do where one is not well: what lookhaven doctor tells, for a page.
+// The state of the installation, part by part, and what to do about a fault: what lookhaven doctor reports, for a page.
 //
 // Why so        The checks read all of the store, look at disks that may hang, and ask other hosts. A request must be
 //               answered within seconds all the same, so each check runs in a process of its own and is given up when

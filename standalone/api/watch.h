@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// VEXO.Event Watch: what is being reported, told as it is, until the client or its session goes.
+// VEXO.Event Watch: sends alerts and POS transactions as they are reported, until the client or its session ends.
 #pragma once
 
 #include <string>

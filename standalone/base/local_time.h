@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Times of day where this host stands.
+// Times of day in this host's time zone.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// SHA-256 of what comes piece by piece.
+// SHA-256 of data that arrives in pieces.
 #pragma once
 
 #include <cstddef>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How the cameras are, as the recorder tells it.
+// The states of cameras, as the recorder reports them.
 #pragma once
 
 #include <map>

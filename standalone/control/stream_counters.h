@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder counts of each stream that it runs, for those who watch over the installation.
+// What the recorder counts of each stream that it runs, for monitoring.
 //
 // Why so        Numbers that change with every frame do not belong in a file that is replaced, nor in the store. So
 //               they lie in a mapped file, to which the recorder copies its counts every second.

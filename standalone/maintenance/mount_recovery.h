@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder does at its start: it closes what an earlier one left open.
+// Recovers a mount when a recorder begins to use it: closes what an earlier recorder left open.
 #pragma once
 
 #include <cstdint>

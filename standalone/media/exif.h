@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How a camera was held when it took a JPEG picture.
+// The orientation of a JPEG picture, from its EXIF data.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Copies parts of recordings, one behind the other, into one container.
+// Copies parts of recordings, one after the other, into one container.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a plan that goes by the hour of the week means at a moment.
+// What a recording plan with a weekly schedule says at a given time.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How much a stream sends a second, out of counts that grow.
+// Pictures and bytes a second of a stream, from its running totals.
 #pragma once
 
 #include <cstdint>

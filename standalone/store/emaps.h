@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// E-maps: floor plans and what is placed on them. Their pictures' files stand in emap/pictures.h.
+// E-maps: floor plans and what is placed on them. Their pictures: emap/pictures.h.
 #pragma once
 
 #include <map>

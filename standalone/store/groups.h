@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Camera groups. What is denied of a group to a user see users.h.
+// Camera groups. What a user is denied of a group is in users.h.
 #pragma once
 
 #include <optional>

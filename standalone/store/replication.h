@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What PostgreSQL says of its own replication, for those who watch over the installation.
+// The state of PostgreSQL's replication, for monitoring.
 #pragma once
 
 #include <cstdint>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every change of an account begins and ends with. For this folder's sources.
+// Statements that several changes of an account share. For this folder's sources.
 #pragma once
 
 #include "standalone/store/connection.h"

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A disk that does not tell of a file that its folder lists. Defines fstatat: include it in one source of a program.
+// A disk on which a file that its folder lists cannot be examined. Defines fstatat: include it in one
+// source of a program.
 #pragma once
 
 #include <atomic>

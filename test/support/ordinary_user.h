@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A user whom the permissions of files stop.
+// A user to whom file permissions apply.
 #pragma once
 
 #include <gtest/gtest.h>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which recording of a camera has a time, and which comes after.
+// Finds the recording of a camera at a given time, and the one after it.
 
 import type { Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";

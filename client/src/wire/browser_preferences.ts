@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What earlier versions kept in the browser, for each user of it, by the names that it has now.
+// Preferences that earlier versions kept in the browser for all of its users, under their present names.
 
 const kLayout = "lookhaven.layout";
 const kOrder = "lookhaven.order";

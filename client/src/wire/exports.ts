@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What is taken away as files, and what is kept from retention.
+// Exports of footage as files, and recordings that are protected from retention.
 
 import { kindParameter, type Footage, type FootageRef } from "./footage";
 import { address, type Server } from "./server";

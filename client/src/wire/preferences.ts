@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the account prefers: asked for once, after the log-in, then known at once; what changes is told to the server a
-// moment later.
+// The account's preferences: read once, after the log-in, then known at once; changes are sent to the server a moment
+// later.
 //
 // Why so        On the server it follows the account to every browser, and stays apart where two accounts share one. A
 //               server that fails holds nobody up: a session without what was preferred is better than none.

@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+//
+// How many new events there are, in words.
 
 import type { News } from "../../wire/alerts";
 
