@@ -2,14 +2,15 @@
 //
 // Starts the web client. Where things are:
 //
-//   wire/      the network: the web API (server, recordings and their footage, exports, emaps; for managers
+//   wire/      the network: the web API (server, camera, recordings and their footage, exports, emaps; for managers
 //              camera_setup, groups, emap_setup, devices, hosts with their pairing_code, accounts, mounts, system,
 //              audit), what the account prefers (preferences, of earlier versions browser_preferences), what is being
 //              reported (alerts, from an event_stream), why cameras send nothing (signal_losses), the parts of an
-//              endless answer (multipart), files that are sent (upload), requests that end in time (deadline) and take
-//              turns (semaphore), cancellable waits (delay), what the page came over (protocol)
+//              endless answer (multipart), files that are sent (upload), requests that end in time (deadline), take
+//              turns (semaphore) and are repeated (keep_trying, backoff), cancellable waits (delay), what the page came
+//              over (protocol)
 //   live/      live pictures: sources of them behind one interface (source: stream_source, snapshot_source), kept
-//              running by a feed, watched by signal_state, shared out by stream_budget. video_player (with frame_gate)
+//              running by a feed, watched by signal_state, limited by stream_budget. video_player (with frame_gate)
 //              and audio_player (with jitter_buffer) decode compressed streams, av_clock keeps them in sync.
 //              unplayable: why a stream cannot be played in this browser. alert_watch: alerts, as they are reported
 //   playback/  recordings: what is known of them (footage_cache, footage_lookup, coverage, recorded_days), fetched a
@@ -17,10 +18,10 @@
 //              still_reader, playback): footage_stream chooses between pictures (frame_stream) and what was recorded
 //              (video_stream, with video_decoding and recorded_sound). sync_playback keeps the players of several
 //              cameras (tracks) in step by one playback_clock; scrub_stills: the pictures of a playhead that is
-//              dragged; event_walk: the events before and after
-//   ui/        app goes from screen to screen
+//              dragged; still_loader: those of a list; event_walk: the events before and after
+//   ui/        app goes from screen to screen, as the address says (route, events/events_route)
 //     screens/    what fills the window: login, first account (setup), wall, events, maps, settings; what they have in
-//                 common (screen), and their addresses (route)
+//                 common (screen)
 //     wall/       the grid of tiles and its layouts; those that are saved, sequences of them, and their menu
 //     camera/     one camera live: its picture, the large view, snapshots
 //     events/     the stage of players with its transport controls; the overview: calendar, filter and list of events

@@ -6,12 +6,12 @@
 // Why so        Over HTTP/1.1 a stream would hold one of the browser's six connections for good. There it is opened
 //               every few seconds instead, and closed when it has told what was missed.
 
+import { Backoff } from "../wire/backoff";
 import { Deadline } from "../wire/deadline";
 import { delay } from "../wire/delay";
 import { EventStreamParser, type StreamEvent } from "../wire/event_stream";
 import type { RawMark } from "../wire/footage";
 import { asServerError, type Server } from "../wire/server";
-import { Backoff } from "./backoff";
 
 const kBadRequest = 400;
 /** Longer than two of the server's events apart: each 15 seconds, it tells at least that it is alive. */

@@ -2,9 +2,9 @@
 //
 // Keeps one picture on the screen live: runs a source, reconnects with growing delays, and watches the signal.
 
+import { Backoff } from "../wire/backoff";
 import { delay } from "../wire/delay";
 import { ServerError } from "../wire/server";
-import { Backoff } from "./backoff";
 import { SignalMonitor, type SignalState } from "./signal_state";
 import type { Frame, LiveSource } from "./source";
 

@@ -2,9 +2,9 @@
 //
 // Live pictures of a camera by polling for snapshots: for tiles without a stream of their own.
 
+import type { Camera } from "../wire/camera";
 import { delay } from "../wire/delay";
 import type { Semaphore } from "../wire/semaphore";
-import type { Camera } from "../wire/camera";
 import type { Server } from "../wire/server";
 import type { Frame, LiveSource } from "./source";
 

@@ -9,9 +9,9 @@
 //               A stream that cannot be played here is closed, and still pictures are asked for in its place for a
 //               while.
 
+import { kVideoTypeMjpeg, type Camera } from "../wire/camera";
 import { Deadline } from "../wire/deadline";
 import { MultipartError, MultipartParser, boundaryOf, type Part } from "../wire/multipart";
-import { kVideoTypeMjpeg, type Camera } from "../wire/camera";
 import { ServerError, type Server } from "../wire/server";
 import type { AudioPlayer } from "./audio_player";
 import { captureOf, mediaOf } from "./media_part";

@@ -13,8 +13,8 @@
 //               (2) It is told for the account that was asked for: once somebody else has logged in in another tab,
 //                   the server refuses it.
 
-import { asServerError, type Server } from "./server";
 import { forgetKeptByBrowser, keptByBrowser } from "./browser_preferences";
+import { asServerError, type Server } from "./server";
 
 const kApi = "VEXO.User";
 const kTimeoutMs = 5_000;

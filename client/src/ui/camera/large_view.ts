@@ -5,8 +5,8 @@
 import { AudioPlayer } from "../../live/audio_player";
 import { SnapshotSource } from "../../live/snapshot_source";
 import { StreamSource } from "../../live/stream_source";
-import { Semaphore } from "../../wire/semaphore";
 import type { Camera } from "../../wire/camera";
+import { Semaphore } from "../../wire/semaphore";
 import type { Server } from "../../wire/server";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";

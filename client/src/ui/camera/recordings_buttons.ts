@@ -3,7 +3,7 @@
 // Buttons from a camera's live picture to its recordings.
 
 import type { Camera } from "../../wire/camera";
-import { cameraAddress } from "../screens/events_route";
+import { cameraAddress } from "../events/events_route";
 import { iconButton } from "../widgets/button";
 
 const kRecentMs = 30_000;

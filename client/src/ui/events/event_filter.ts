@@ -3,10 +3,10 @@
 // Which cameras and which kinds of events the timeline and the list show; kept for the next visit.
 
 import { kEventKinds, kindOf, type EventKind } from "../../playback/coverage";
+import type { Camera } from "../../wire/camera";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
 import type { CameraGroup } from "../../wire/recordings";
-import type { Camera } from "../../wire/camera";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { kKindNames } from "./event_list";

@@ -3,13 +3,13 @@
 // The events and marks of a span as cards with a picture each, newest first; only those on the screen exist.
 
 import { kindOf, type EventKind } from "../../playback/coverage";
+import { StillLoader } from "../../playback/still_loader";
 import { describe, type Footage, type FootageRef } from "../../wire/footage";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { clockTime, duration, minuteText, shortDate } from "../widgets/text";
 import { isInRow, type EventRow } from "./folded_events";
-import { StillLoader } from "./still_loader";
 
 /** Rows kept beyond the visible ones, so that scrolling shows no gap. */
 const kOverscanRows = 4;

@@ -2,9 +2,9 @@
 //
 // Chooses what to take away as a file: a span and cameras. Says how long and how large that is, and what is missing.
 
+import type { Camera } from "../../wire/camera";
 import type { ExportPlan, Exports } from "../../wire/exports";
 import type { Footage } from "../../wire/footage";
-import type { Camera } from "../../wire/camera";
 import { ServerError } from "../../wire/server";
 import type { Span } from "../timeline/span_handles";
 import { bytesText } from "../widgets/amounts";

@@ -6,10 +6,10 @@
 import { FootageCache } from "../../playback/footage_cache";
 import { FootageOutline } from "../../playback/footage_outline";
 import { RecordedDays } from "../../playback/recorded_days";
+import type { Camera } from "../../wire/camera";
 import type { Footage } from "../../wire/footage";
 import type { Preferences } from "../../wire/preferences";
 import type { Recordings } from "../../wire/recordings";
-import type { Camera } from "../../wire/camera";
 import { spanText } from "../timeline/time_scale";
 import { Timeline, type TimelineActions } from "../timeline/timeline";
 import { Calendar } from "./calendar";

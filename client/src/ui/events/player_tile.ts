@@ -5,8 +5,8 @@
 
 import type { Player } from "../../playback/player";
 import type { PlayerState } from "../../playback/player_state";
-import type { Still } from "../../wire/recordings";
 import type { Snapshot } from "../../wire/camera";
+import type { Still } from "../../wire/recordings";
 import { iconButton } from "../widgets/button";
 import { draw, element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";

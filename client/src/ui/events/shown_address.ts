@@ -7,9 +7,9 @@ import type { SyncPlayback } from "../../playback/sync_playback";
 import { isSameFootage } from "../../wire/footage";
 import type { Recordings } from "../../wire/recordings";
 import { asServerError } from "../../wire/server";
-import { parseEventsAddress, recordEventsAddress, type EventsAddress } from "../screens/events_route";
 import { notify } from "../widgets/notice";
 import type { EventsJumps } from "./events_jumps";
+import { parseEventsAddress, recordEventsAddress, type EventsAddress } from "./events_route";
 import type { Overview } from "./overview";
 import type { Stage } from "./stage";
 

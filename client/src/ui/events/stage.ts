@@ -5,9 +5,9 @@
 
 import { kStillWidths, type ScrubRequest } from "../../playback/scrub_stills";
 import type { SyncPlayback } from "../../playback/sync_playback";
+import type { Camera, Snapshot } from "../../wire/camera";
 import type { Footage } from "../../wire/footage";
 import type { Still } from "../../wire/recordings";
-import type { Camera, Snapshot } from "../../wire/camera";
 import { element } from "../widgets/dom";
 import { PlayerTile } from "./player_tile";
 import { emptyCell } from "./stage_cell";

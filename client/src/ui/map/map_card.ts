@@ -4,10 +4,10 @@
 // latest transactions.
 
 import { SnapshotSource } from "../../live/snapshot_source";
+import type { Camera } from "../../wire/camera";
 import type { Footage } from "../../wire/footage";
 import { Recordings } from "../../wire/recordings";
 import { Semaphore } from "../../wire/semaphore";
-import type { Camera } from "../../wire/camera";
 import type { Server } from "../../wire/server";
 import { recordingsButtons } from "../camera/recordings_buttons";
 import { draw, element, setText } from "../widgets/dom";

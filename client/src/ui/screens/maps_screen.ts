@@ -2,21 +2,21 @@
 //
 // One e-map at a time: its picture with what is placed on it, its editor, and over it a camera that was opened there.
 
-import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem, type ViewerMap } from "../../wire/emaps";
 import type { Camera } from "../../wire/camera";
+import { Emaps, type DeviceState, type EditedMap, type MapName, type ViewerItem, type ViewerMap } from "../../wire/emaps";
+import { keepTrying } from "../../wire/keep_trying";
 import { asServerError, type ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { MapCard } from "../map/map_card";
 import { kEditorKeys, MapEditor } from "../map/map_editor";
 import type { MapItemView } from "../map/map_item";
 import { MapView } from "../map/map_view";
+import { leaveMapCamera, openMap, replaceRoute, showMap } from "../route";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import type { KeyList } from "../widgets/keys_dialog";
 import { notify } from "../widgets/notice";
 import { titleScreen } from "../widgets/title";
-import { keepTrying } from "./keep_trying";
-import { leaveMapCamera, openMap, replaceRoute, showMap } from "./route";
 import { Screen } from "./screen";
 import type { RememberedState, Session } from "./session";
 

@@ -4,9 +4,9 @@
 
 import type { Alerts } from "../../wire/alerts";
 import { newsText } from "../events/news_text";
+import type { ScreenName } from "../route";
 import { element, setText } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
-import type { ScreenName } from "./route";
 
 const kLinks: [ScreenName, IconName, label: string, href: string][] = [
   ["wall", "live", "Live", "#"],

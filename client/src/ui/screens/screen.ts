@@ -6,6 +6,7 @@
 
 import type { Preferences } from "../../wire/preferences";
 import type { Server } from "../../wire/server";
+import type { ScreenName } from "../route";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -15,7 +16,6 @@ import { clockTime } from "../widgets/text";
 import { titleScreen } from "../widgets/title";
 import { AccountMenu } from "./account_menu";
 import { navigation } from "./navigation";
-import type { ScreenName } from "./route";
 import type { Session } from "./session";
 
 const kClockMs = 500;

@@ -2,17 +2,18 @@
 //
 // The settings' screen, for managers: its sections, and in each a list or one record of it.
 
+import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "../route";
+import { AccountPage } from "../settings/accounts/account_page";
+import { AccountsPage } from "../settings/accounts/accounts_page";
 import { AuditPage } from "../settings/audit/audit_page";
 import { CameraPage } from "../settings/cameras/camera_page";
 import { CamerasPage } from "../settings/cameras/cameras_page";
-import { noRightState, type Page, type PageContext } from "../settings/page";
-import { AccountsPage } from "../settings/accounts/accounts_page";
-import { AccountPage } from "../settings/accounts/account_page";
 import { DevicesPage } from "../settings/devices/devices_page";
 import { GroupPage } from "../settings/groups/group_page";
 import { GroupsPage } from "../settings/groups/groups_page";
-import { MapsPage } from "../settings/maps/maps_page";
 import { HostsPage } from "../settings/hosts/hosts_page";
+import { MapsPage } from "../settings/maps/maps_page";
+import { noRightState, type Page, type PageContext } from "../settings/page";
 import { MountPage } from "../settings/storage/mount_page";
 import { StoragePage } from "../settings/storage/storage_page";
 import { SystemPage } from "../settings/system/system_page";
@@ -20,7 +21,6 @@ import { element } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
 import { titleScreen } from "../widgets/title";
-import { leaveSettingsRecord, openSettings, settingsAddress, type OpenSettings, type SettingsSection } from "./route";
 import { Screen } from "./screen";
 import type { RememberedState, Session } from "./session";
 import { SetupSteps } from "./setup_steps";

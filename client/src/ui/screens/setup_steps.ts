@@ -3,8 +3,8 @@
 // Leads the user who has just made the first account through the settings: the first camera, then storage. Each can be
 // skipped.
 
+import { settingsAddress, type OpenSettings } from "../route";
 import { element } from "../widgets/dom";
-import { settingsAddress, type OpenSettings } from "./route";
 
 const kSteps = ["Account", "First camera", "Storage"] as const;
 

@@ -3,11 +3,13 @@
 // The wall: the live pictures of all cameras, of a group, or of a saved layout.
 
 import { missingDecoder } from "../../live/unplayable";
-import { Recordings } from "../../wire/recordings";
 import { kVideoTypeMjpeg, type Camera, type CameraList } from "../../wire/camera";
+import { keepTrying } from "../../wire/keep_trying";
+import { Recordings } from "../../wire/recordings";
 import { ServerError } from "../../wire/server";
 import { CameraOverlay } from "../camera/camera_overlay";
 import { unplayableHint } from "../camera/unplayable_hint";
+import { openCamera, openWall, settingsAddress, showCamera, showWall } from "../route";
 import type { AbsentCameras } from "../wall/absent_cameras";
 import { Grid } from "../wall/grid";
 import { GroupTabs } from "../wall/group_tabs";
@@ -20,8 +22,6 @@ import { element, setText } from "../widgets/dom";
 import { fullScreenButton, toggleFullScreen } from "../widgets/full_screen";
 import { icon, type IconName } from "../widgets/icons";
 import type { KeyList } from "../widgets/keys_dialog";
-import { keepTrying } from "./keep_trying";
-import { openCamera, openWall, settingsAddress, showCamera, showWall } from "./route";
 import { Screen } from "./screen";
 import type { Session } from "./session";
 

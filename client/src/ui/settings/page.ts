@@ -3,8 +3,8 @@
 // What the pages of the settings have in common: how the screen deals with them, and how they look while there is
 // nothing to show.
 
+import { keepTrying } from "../../wire/keep_trying";
 import { asServerError, type Account, type Server, type ServerError } from "../../wire/server";
-import { keepTrying } from "../screens/keep_trying";
 import { element } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 import type { Draft } from "./draft";

@@ -4,7 +4,7 @@
 // all. Cameras, accounts and mounts differ in their fields, and in how they are saved.
 
 import { capitalized } from "../../wire/sentence";
-import { settingsAddress, type SettingsSection } from "../screens/route";
+import { settingsAddress, type SettingsSection } from "../route";
 import { button } from "../widgets/button";
 import type { IconName } from "../widgets/icons";
 import { notify } from "../widgets/notice";

@@ -3,7 +3,7 @@
 // What lies under the pointer on the timeline: a line through all lanes, and beside it the time, what happened then,
 // and a picture of it once the pointer rests.
 
-import { StillLoader } from "../events/still_loader";
+import { StillLoader } from "../../playback/still_loader";
 import { element, setText } from "../widgets/dom";
 import type { Point } from "../widgets/pan_zoom";
 

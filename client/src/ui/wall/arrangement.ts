@@ -3,8 +3,8 @@
 // Grid and order of the wall: the user's own, kept for the next visit, or those of a saved layout, whose changes last
 // until another is shown.
 
-import type { Preferences } from "../../wire/preferences";
 import type { Camera } from "../../wire/camera";
+import type { Preferences } from "../../wire/preferences";
 import type { TileOrder } from "./grid";
 import { kLayoutChoices, type LayoutChoice } from "./layout";
 import type { SavedLayout } from "./saved_layouts";

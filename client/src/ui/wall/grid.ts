@@ -7,9 +7,9 @@
 //               (2) Never more tiles stream than the connection to the server carries.
 
 import { chooseStreams, streamLimit } from "../../live/stream_budget";
+import type { Camera } from "../../wire/camera";
 import { protocol } from "../../wire/protocol";
 import { Semaphore } from "../../wire/semaphore";
-import type { Camera } from "../../wire/camera";
 import type { Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import type { AbsentCamera } from "./absent_cameras";

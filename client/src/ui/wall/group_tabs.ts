@@ -4,7 +4,7 @@
 // Nothing where there are no groups, and no layout is shown.
 
 import type { CameraGroup } from "../../wire/recordings";
-import { groupAddress, savedAddress, type OpenWall } from "../screens/route";
+import { groupAddress, savedAddress, type OpenWall } from "../route";
 import { element } from "../widgets/dom";
 
 export class GroupTabs {

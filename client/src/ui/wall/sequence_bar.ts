@@ -2,7 +2,7 @@
 //
 // The line above the wall while a sequence is shown: which layout it has come to, what comes next, and its controls.
 
-import { savedAddress } from "../screens/route";
+import { savedAddress } from "../route";
 import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";

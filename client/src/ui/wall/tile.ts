@@ -5,8 +5,8 @@
 import { SnapshotSource } from "../../live/snapshot_source";
 import { StreamSource } from "../../live/stream_source";
 import type { Unplayable } from "../../live/unplayable";
-import type { Semaphore } from "../../wire/semaphore";
 import type { Camera } from "../../wire/camera";
+import type { Semaphore } from "../../wire/semaphore";
 import type { Server } from "../../wire/server";
 import { LivePicture, type PictureState } from "../camera/live_picture";
 import { recordingsButtons } from "../camera/recordings_buttons";

@@ -3,10 +3,10 @@
 // Which of the account's cameras the wall shows: all, those of a group, those of a saved layout, or those of the layout
 // that a sequence has come to.
 
+import type { Camera } from "../../wire/camera";
 import type { Preferences } from "../../wire/preferences";
 import type { CameraGroup } from "../../wire/recordings";
-import type { Camera } from "../../wire/camera";
-import type { OpenWall } from "../screens/route";
+import type { OpenWall } from "../route";
 import { Arrangement } from "./arrangement";
 import { SavedLayouts, type SavedLayout } from "./saved_layouts";
 import { SequenceRun } from "./sequence_run";

@@ -3,7 +3,7 @@
 // The menu of saved layouts and sequences, opened from the wall's bar.
 
 import type { Camera } from "../../wire/camera";
-import { savedAddress } from "../screens/route";
+import { savedAddress } from "../route";
 import { button, iconButton } from "../widgets/button";
 import { element } from "../widgets/dom";
 import { notify } from "../widgets/notice";

@@ -3,8 +3,8 @@
 // The order of the wall's tiles: the user's own is kept, that of a saved layout is changed for the time being.
 
 import { Arrangement } from "../../../../client/src/ui/wall/arrangement";
-import type { Preferences } from "../../../../client/src/wire/preferences";
 import type { Camera } from "../../../../client/src/wire/camera";
+import type { Preferences } from "../../../../client/src/wire/preferences";
 
 const cameras = (...ids: number[]) => ids.map((id) => ({ id }) as Camera);
 

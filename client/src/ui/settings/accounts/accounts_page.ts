@@ -3,7 +3,7 @@
 // All accounts: what each may do, whether it is in use, and when it last was.
 
 import { Accounts, type UserList, type UserRecord } from "../../../wire/accounts";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { counted } from "../../widgets/amounts";
 import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";

@@ -2,11 +2,11 @@
 //
 // One camera in the list of cameras: its picture, its state, what it sends and when it is recorded.
 
-import type { CameraRecord, Named } from "../../../wire/camera_setup";
 import { kVideoTypeMjpeg } from "../../../wire/camera";
+import type { CameraRecord, Named } from "../../../wire/camera_setup";
 import type { Server } from "../../../wire/server";
 import { causeText } from "../../../wire/signal_losses";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { bytesText } from "../../widgets/amounts";
 import { draw, element, setText } from "../../widgets/dom";
 import { minuteText } from "../../widgets/text";

@@ -5,7 +5,7 @@
 import { CameraSetup, type CameraOrder, type CameraSetupList } from "../../../wire/camera_setup";
 import { Semaphore } from "../../../wire/semaphore";
 import { asServerError } from "../../../wire/server";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { linkButton } from "../../widgets/button";
 import { element, setText } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";

@@ -5,7 +5,7 @@
 import { CameraSetup, type Named } from "../../../wire/camera_setup";
 import { Devices, type DeviceRecord } from "../../../wire/devices";
 import { asServerError } from "../../../wire/server";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { counted } from "../../widgets/amounts";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";

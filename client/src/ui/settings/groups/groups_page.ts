@@ -4,7 +4,7 @@
 
 import { CameraSetup, type Named } from "../../../wire/camera_setup";
 import { Groups, type GroupRecord } from "../../../wire/groups";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { emptyState, LoadedPage, type PageContext } from "../page";

@@ -4,7 +4,7 @@
 
 import { Hosts, type HostList, type HostRecord } from "../../../wire/hosts";
 import { asServerError } from "../../../wire/server";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";

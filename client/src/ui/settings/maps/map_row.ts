@@ -4,7 +4,7 @@
 
 import type { EmapRecord } from "../../../wire/emap_setup";
 import type { Emaps } from "../../../wire/emaps";
-import { editedMapAddress } from "../../screens/route";
+import { editedMapAddress } from "../../route";
 import { counted } from "../../widgets/amounts";
 import { button, linkButton } from "../../widgets/button";
 import { element, setText } from "../../widgets/dom";

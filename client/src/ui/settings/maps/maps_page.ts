@@ -6,7 +6,7 @@ import { EmapSetup, type EmapRecord } from "../../../wire/emap_setup";
 import { Emaps } from "../../../wire/emaps";
 import { Semaphore } from "../../../wire/semaphore";
 import { asServerError } from "../../../wire/server";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { button, linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { notify } from "../../widgets/notice";

@@ -3,7 +3,7 @@
 // One mount: how much of it is used, for how long it lasts, and what each camera needs.
 
 import type { MountRecord } from "../../../wire/mounts";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { bytesText } from "../../widgets/amounts";
 import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";

@@ -3,7 +3,7 @@
 // All mounts, and how much room they have.
 
 import { Mounts, type MountRecord } from "../../../wire/mounts";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { linkButton } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { emptyState, LoadedPage, type PageContext } from "../page";

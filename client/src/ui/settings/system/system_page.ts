@@ -5,7 +5,7 @@
 import { sentenceOf } from "../../../wire/sentence";
 import { asServerError, ServerError } from "../../../wire/server";
 import { System, type SettingRecord } from "../../../wire/system";
-import { settingsAddress } from "../../screens/route";
+import { settingsAddress } from "../../route";
 import { button, linkButton, whileBusy } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";

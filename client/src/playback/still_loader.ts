@@ -2,8 +2,8 @@
 //
 // Loads the pictures of a list, a few at once, and none that is scrolled past.
 
-import { delay } from "../../wire/delay";
-import { Semaphore } from "../../wire/semaphore";
+import { delay } from "../wire/delay";
+import { Semaphore } from "../wire/semaphore";
 
 /** Over HTTP/1.1 a browser has six connections, and up to four are playing. */
 const kMaxConcurrent = 2;

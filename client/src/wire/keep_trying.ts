@@ -3,9 +3,9 @@
 // Asks the server again until it answers, so that a screen that was opened while the server was unreachable fills by
 // itself.
 
-import { Backoff } from "../../live/backoff";
-import { delay } from "../../wire/delay";
-import { asServerError } from "../../wire/server";
+import { Backoff } from "./backoff";
+import { delay } from "./delay";
+import { asServerError } from "./server";
 
 /**
  * The answer; undefined once `signal` is aborted. `failed` gets a sentence for the user after each attempt that failed.

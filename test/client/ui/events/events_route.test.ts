@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 
-import { cameraAddress, formatEventsAddress, parseEventsAddress, type EventsAddress } from "../../../../client/src/ui/screens/events_route";
+import { cameraAddress, formatEventsAddress, parseEventsAddress, type EventsAddress } from "../../../../client/src/ui/events/events_route";
 
 describe("an address of the events' screen", () => {
   const all = ["continuous", "alarm", "alert", "pos"] as const;

@@ -13,7 +13,7 @@
 // Why so        A link, Back and Forward have changed the address before anyone can be asked. So each entry of the
 //               browser's history has a number, by which a refused step is taken back.
 
-import type { Camera } from "../../wire/camera";
+import type { Camera } from "../wire/camera";
 
 export type ScreenName = "wall" | "events" | "maps" | "settings";
 export const kSettingsSections = [

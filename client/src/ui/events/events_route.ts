@@ -13,9 +13,9 @@
 
 import { kEventKinds } from "../../playback/coverage";
 import type { EventKind, FootageRef } from "../../wire/footage";
-import type { ListChoice } from "../events/event_filter";
-import { kStageLayouts, type StagePlan } from "../events/stage_layout";
-import { recordAddress } from "./route";
+import { recordAddress } from "../route";
+import type { ListChoice } from "./event_filter";
+import { kStageLayouts, type StagePlan } from "./stage_layout";
 
 export interface EventsAddress {
   /** Null where nothing was recorded, or nothing plays. */

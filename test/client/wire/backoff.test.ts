@@ -2,7 +2,7 @@
 //
 // How long one waits before it reconnects.
 
-import { Backoff } from "../../../client/src/live/backoff";
+import { Backoff } from "../../../client/src/wire/backoff";
 
 test("back-off grows to fifteen seconds, spreads by a quarter, starts again after success", () => {
   const lowest = new Backoff(() => 0);
