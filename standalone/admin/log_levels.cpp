@@ -110,7 +110,7 @@ const base::Names<int>& LogLevels() {
 }
 
 const base::Names<int>& LogCategories() {
-    static const base::Names<int> names = {{"liveview", 32}, {"player", 68}};
+    static const base::Names<int> names = {{"liveview", 32}, {"player", 68}, {"requests", control::kRequestsCategory}};
     return names;
 }
 

@@ -33,6 +33,7 @@ Json::Value Identity(store::Store& records, const std::string& account, int user
 }
 
 std::string LoggedIn(const Call& call, const store::User& user, const store::NewSession& session) {
+    control::SlotTable::SetAccount(call.slot, user.name);
     LogAccepted(call.context.Installation(), user.name, call.request.Header("REMOTE_ADDR"));
     return SuccessAnswer(Identity(call.Records(), user.name, user.id, user.IsManager()),
                          CookieLine(call.request, session.secret));

@@ -37,6 +37,7 @@ Call ReadCall(const base::Installation& installation, const http::RequestCounter
     call.login = FindLogin(call);
     if (call.login) {
         base::SetLogAccount(call.login->account);
+        control::SlotTable::SetAccount(slot, call.login->account);
     }
     const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
     if (!call.login && body_bytes > http::kMaxBodyWithoutSession) {

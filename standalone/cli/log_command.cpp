@@ -75,7 +75,8 @@ void AddLog(CLI::App& program, const Console& console) {
     CommandGroup<Request> group(program, console, "log", "Log levels");
     Request& request = group.request();
     const auto category = [](CLI::Option& option) {
-        option.transform(CLI::Transformer(admin::LogCategories()).description(""))->type_name("liveview|player|NUMBER");
+        option.transform(CLI::Transformer(admin::LogCategories()).description(""))
+            ->type_name("liveview|player|requests|NUMBER");
         option.check(CLI::Range(0, control::kDebugLogCategoryCount - 1));
     };
     group.Add("show", "Shows the log levels", Show);

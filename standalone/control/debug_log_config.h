@@ -21,6 +21,10 @@ namespace lookhaven::control {
 constexpr int kDebugLogCategoryCount = 512;
 constexpr int kDebugLogProcessCount = 256;
 
+// Of what the host logs of requests; the last one, which no module has.
+constexpr int kRequestsCategory = kDebugLogCategoryCount - 1;
+constexpr int kDebugLevel = 6;
+
 struct DebugLogConfig {
     struct Process {
         std::int32_t pid;

@@ -2,6 +2,7 @@
 //
 // What a request process writes into its slot for others to read: its session and its call.
 #include <algorithm>
+#include <span>
 #include <stdexcept>
 
 #include "standalone/control/slot_table.h"
@@ -10,7 +11,7 @@ namespace lookhaven::control {
 
 namespace {
 
-std::string_view TextIn(const std::array<char, 64>& text) {
+std::string_view TextIn(std::span<const char> text) {
     return {text.begin(), std::ranges::find(text, '\0')};  // a process that was taken over may have left no end
 }
 
@@ -21,6 +22,11 @@ void SlotTable::SetCall(Slot& slot, std::string_view call) {
     slot.call.fill('\0');
     call.copy(slot.call.data(), slot.call.size() - 1);
     slot.has_call = true;
+}
+
+void SlotTable::SetAccount(Slot& slot, std::string_view account) {
+    slot.account.fill('\0');
+    account.copy(slot.account.data(), slot.account.size() - 1);
 }
 
 void SlotTable::SetSession(Slot& slot, std::string_view handle) {
@@ -43,6 +49,10 @@ std::string_view CallOf(const Slot& slot) {
         return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' || c == '/';
     });
     return is_name ? call : std::string_view{};
+}
+
+std::string_view AccountOf(const Slot& slot) {
+    return TextIn(slot.account);
 }
 
 }  // namespace lookhaven::control

@@ -69,6 +69,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->is_stream = false;
     slot->has_session = false;
     slot->has_call = false;
+    slot->account.fill('\0');
     slot->status = 0;
     slot->pid = 0;
     slot->user = 0;

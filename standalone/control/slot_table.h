@@ -89,7 +89,8 @@ struct alignas(kSlotBytes) Slot {
     std::array<char, 64> session;
     std::atomic<bool> has_call;
     std::array<char, 64> call;
-    std::atomic<int> status;  // of the answer, once it is known
+    std::array<char, 65> account;  // of its session
+    std::atomic<int> status;       // of the answer, once it is known
     Player player;
     std::atomic<std::int64_t> forwarded_player_key;  // of the player whose stream it forwards; 0: none
     std::atomic<int> player_host_id;                 // the host where that player runs
@@ -125,6 +126,8 @@ class SlotTable {
 
     // For a request process: what it serves, "VEXO.Event/List", for those who count; only the first 63 bytes are kept.
     static void SetCall(Slot& slot, std::string_view call);
+    // For a request process: whose it is; only the first 64 bytes are kept, and no account has more.
+    static void SetAccount(Slot& slot, std::string_view account);
     // Visits the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;
 
@@ -218,5 +221,7 @@ class SlotTable {
 std::string_view SessionOf(const Slot& slot);
 // What it serves; empty while that is not known, or is no call's name.
 std::string_view CallOf(const Slot& slot);
+// Whose it is, any bytes; empty where nobody has logged in. For the host, once the process has ended.
+std::string_view AccountOf(const Slot& slot);
 
 }  // namespace lookhaven::control

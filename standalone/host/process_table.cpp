@@ -50,9 +50,14 @@ bool IsReplaced(pid_t pid, const control::Slot& slot) {
 
 }  // namespace
 
-void ProcessTable::Add(Child child, base::FileDescriptor connection, control::Slot& slot) {
-    processes_.insert_or_assign(
-        child.pid, Process{std::move(connection), std::move(child.process), &slot, Clock::now(), std::nullopt, {}});
+void ProcessTable::Add(Child child, base::FileDescriptor connection, control::Slot& slot, std::string address) {
+    processes_.insert_or_assign(child.pid, Process{std::move(connection),
+                                                   std::move(child.process),
+                                                   &slot,
+                                                   Clock::now(),
+                                                   std::nullopt,
+                                                   {},
+                                                   std::move(address)});
 }
 
 void ProcessTable::HangUp(pid_t pid) {
@@ -105,8 +110,10 @@ bool ProcessTable::Reap(pid_t pid) {
 
 void ProcessTable::Count(const Process& process, bool is_crash) {
     const control::Slot& slot = *process.slot;
-    counters_.NoteServed(control::CallOf(slot), is_crash ? 0 : slot.status.load(), slot.is_stream,
-                         std::chrono::duration_cast<std::chrono::microseconds>(Clock::now() - process.began));
+    const int status = is_crash ? 0 : slot.status.load();
+    const auto took = std::chrono::duration_cast<std::chrono::microseconds>(Clock::now() - process.began);
+    counters_.NoteServed(control::CallOf(slot), status, slot.is_stream, took);
+    log_.Note(slot, process.address, status, took);
 }
 
 void ProcessTable::Sweep(pid_t pid, const control::Slot& slot) const {

@@ -12,15 +12,17 @@
 #pragma once
 
 #include <chrono>
-#include <filesystem>
 #include <map>
 #include <optional>
+#include <string>
 
 #include <sys/types.h>
 
 #include "standalone/base/file_descriptor.h"
+#include "standalone/base/installation.h"
 #include "standalone/control/slot_table.h"
 #include "standalone/host/child.h"
+#include "standalone/host/request_log.h"
 #include "standalone/http/request_counters.h"
 
 namespace lookhaven::host {
@@ -33,16 +35,18 @@ struct ProcessLimits {
 
 class ProcessTable {
   public:
-    // Borrows slots and counters; progress_folder: where players keep their progress files.
+    // Borrows slots and counters.
     ProcessTable(ProcessLimits limits, control::SlotTable& slots, http::RequestCounters& counters,
-                 std::filesystem::path progress_folder)
+                 const base::Installation& installation)
         : limits_(limits),
           slots_(slots),
           counters_(counters),
-          progress_folder_(std::move(progress_folder)) {}
+          log_(installation),
+          progress_folder_(installation.ProgressFolder()) {}
 
-    // The process serves the connection's request from now on. When it has ended, call Reap.
-    void Add(Child child, base::FileDescriptor connection, control::Slot& slot);
+    // The process serves the connection's request, which came from the address, from now on. When it has ended, call
+    // Reap.
+    void Add(Child child, base::FileDescriptor connection, control::Slot& slot, std::string address);
 
     // The process's client is gone: ends the process.
     void HangUp(pid_t pid);
@@ -51,8 +55,8 @@ class ProcessTable {
     void EndMarked();
     // A player is new, or a pause is requested of one: the next SendDueSignals looks at all of them.
     void LookAtPlayers() { players_due_ = Clock::now(); }
-    // The process has ended: counts its request, removes the files that it left, and frees its slot. False when it is
-    // none of these.
+    // The process has ended: counts and logs its request, removes the files that it left, and frees its slot. False
+    // when it is none of these.
     bool Reap(pid_t pid);
 
     // Sends what is due; returns when to come again.
@@ -68,6 +72,7 @@ class ProcessTable {
         Clock::time_point began;
         std::optional<Clock::time_point> ending_since;
         Clock::time_point next_signal;
+        std::string address;
     };
 
     static void BeginEnding(Process& process);
@@ -80,6 +85,7 @@ class ProcessTable {
     ProcessLimits limits_;
     control::SlotTable& slots_;
     http::RequestCounters& counters_;
+    RequestLog log_;
     std::filesystem::path progress_folder_;
     Clock::time_point players_due_ = Clock::time_point::max();
     std::map<pid_t, Process> processes_;

@@ -38,7 +38,7 @@ Server::Server(const base::Installation& installation, Callbacks callbacks, List
       limits_(limits),
       counters_(counters),
       slots_(limits.requests),
-      processes_(limits.processes, slots_, counters, installation.ProgressFolder()),
+      processes_(limits.processes, slots_, counters, installation),
       spares_(limits.spare_processes, slots_,
               {.leave_host =
                    [this, host = ::getpid()](int channel) {
@@ -169,13 +169,14 @@ void Server::StartRequest(Connection connection) {
         return Refuse(connections_[number] = std::move(connection), Busy("too many requests are running"));
     }
     std::optional<Child> child = StartRequestProcess(request, number, *slot);
+    std::string address(request.Header("REMOTE_ADDR"));
     request.Wipe();
     if (!child) {
         slots_.Free(*slot);
         return Refuse(connections_[number] = std::move(connection), Busy("cannot start a request process"));
     }
     const pid_t pid = child->pid;
-    processes_.Add(*std::move(child), std::move(connection.socket), *slot);
+    processes_.Add(*std::move(child), std::move(connection.socket), *slot, std::move(address));
     // Once: the connection stays open, and hung up, until the process is gone.
     poll_.Watch(number, Awaited::kHangUp, static_cast<std::uint32_t>(pid), EPOLLONESHOT);
 }

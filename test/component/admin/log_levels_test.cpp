@@ -67,7 +67,9 @@ TEST_P(LogLevelsTest, HoldAtOnceForThoseCategoriesAlone) {
     EXPECT_EQ(config->process[0].pid, self);
     const std::vector<std::string> entries = Audited();
     ASSERT_EQ(entries.size(), 2U);
-    EXPECT_THAT(entries[1], HasSubstr(R"({"100":"warning","liveview":"debug","others":"error","player":"error"})"));
+    EXPECT_THAT(
+        entries[1],
+        HasSubstr(R"({"100":"warning","liveview":"debug","others":"error","player":"error","requests":"error"})"));
     EXPECT_THAT(entries[0], HasSubstr("\"process " + std::to_string(self) + "\":\"info\""));
     EXPECT_EQ(Try(manager_, {}, {.every = 1, .processes = {{self, 0}}}), "done");
     EXPECT_EQ(LogRecord(installation_)["revision"].asInt64(), first);

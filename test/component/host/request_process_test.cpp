@@ -8,6 +8,7 @@
 #include <fstream>
 #include <iterator>
 #include <random>
+#include <sstream>
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -17,6 +18,7 @@
 
 #include "standalone/base/clock.h"
 #include "standalone/base/process.h"
+#include "standalone/control/debug_log_config.h"
 #include "standalone/host/child.h"
 #include "standalone/host/listener.h"
 #include "standalone/store/users.h"
@@ -66,6 +68,39 @@ TEST(Host, EndsProcessesWhoseClientLeft) {
         << "it ignores SIGTERM";
     EXPECT_EQ(log.find("error: "), log.rfind("error: ")) << "a client that leaves is none";
     EXPECT_EQ(log.find("warning: "), log.npos);
+}
+
+TEST(Host, LogsRequestsWhileThatIsWanted) {
+    testing::internal::CaptureStderr();
+    HostUnderTest host;
+    const std::string guest = host.LogIn("guest").secret;
+    const std::string success = "api=Test&version=1&method=Success&password=hidden";
+    const auto set_level = [&](int level) {
+        control::DebugLogEditor(host.Home()).SetCategory(control::kRequestsCategory, level);
+    };
+    host.Ask(success, guest);
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; })) << "logged by then";
+    set_level(control::kDebugLevel);
+    host.Ask(success, guest);
+    host.Ask("api=Test&version=1&method=Crash", guest);
+    host.Ask("api=%0aNone&version=1&method=Success", "");
+    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
+    set_level(control::kDebugLevel - 1);
+    host.Ask(success, guest);
+    host.End(SIGTERM);
+    std::istringstream log(testing::internal::GetCapturedStderr());
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(log, line);) {
+        EXPECT_EQ(line.find("hidden"), line.npos);
+        if (const std::size_t at = line.find("info: request: "); at != line.npos) {
+            lines.push_back(line.substr(at));
+        }
+    }
+    const std::string from = " from 192.0.2.7: ";
+    EXPECT_THAT(lines, testing::ElementsAre(
+                           testing::MatchesRegex(".*Test/Success" + from + "200 after [0-9]+ ms, account guest"),
+                           testing::MatchesRegex(".*Test/Crash" + from + "died after [0-9]+ ms, account guest"),
+                           testing::MatchesRegex(".*: -" + from + "404 after [0-9]+ ms, account -")));
 }
 
 TEST_F(RunningHost, RepeatsSigtermUntilAHandlerListens) {

@@ -12,7 +12,7 @@ import { notify } from "../../widgets/notice";
 import { LoadedPart } from "../loaded_part";
 import { SeenRecord } from "../seen_record";
 
-const kNames: Record<string, string> = { liveview: "Live view", player: "Players", others: "Everything else" };
+const kNames: Record<string, string> = { liveview: "Live view", player: "Players", requests: "Requests", others: "Everything else" };
 const kHint = "Messages of this level and more severe ones are logged. Levels hold at once, and until they are changed.";
 /** The most severe first. */
 const kOrder = ["off", "error", "warning", "notice", "info", "debug"];
