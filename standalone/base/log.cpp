@@ -13,6 +13,10 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/journal.h"
 
+// The shared libraries of one process have a copy of this file each. Exported, the program's own is the one that all of
+// them call, so that what is set in one holds for the lines of all.
+#define LOOKHAVEN_ONE_IN_PROCESS [[gnu::visibility("default")]]
+
 namespace lookhaven::base {
 
 namespace {
@@ -45,23 +49,23 @@ std::string OneLine(std::string_view text) {
 
 }  // namespace
 
-void SetLogProgram(const char* program) {
+LOOKHAVEN_ONE_IN_PROCESS void SetLogProgram(const char* program) {
     g_program = program;
 }
 
-void SetLogThreshold(Severity threshold) {
+LOOKHAVEN_ONE_IN_PROCESS void SetLogThreshold(Severity threshold) {
     g_threshold = threshold;
 }
 
-void SetLogCamera(int camera) {
+LOOKHAVEN_ONE_IN_PROCESS void SetLogCamera(int camera) {
     t_camera = camera;
 }
 
-void SetLogAccount(std::string_view account) {
+LOOKHAVEN_ONE_IN_PROCESS void SetLogAccount(std::string_view account) {
     t_account = OneLine(account);
 }
 
-void Log(Severity severity, std::string_view text) noexcept try {
+LOOKHAVEN_ONE_IN_PROCESS void Log(Severity severity, std::string_view text) noexcept try {
     if (severity > g_threshold.load()) {
         return;
     }

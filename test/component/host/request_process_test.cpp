@@ -84,6 +84,7 @@ TEST(Host, LogsRequestsWhileThatIsWanted) {
     host.Ask(success, guest);
     host.Ask("api=Test&version=1&method=Crash", guest);
     host.Ask("api=%0aNone&version=1&method=Success", "");
+    host.Ask("api=Test&version=1&method=Throw", guest);
     ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
     set_level(control::kDebugLevel - 1);
     host.Ask(success, guest);
@@ -92,6 +93,8 @@ TEST(Host, LogsRequestsWhileThatIsWanted) {
     std::vector<std::string> lines;
     for (std::string line; std::getline(log, line);) {
         EXPECT_EQ(line.find("hidden"), line.npos);
+        EXPECT_EQ(line.find("the request failed: ") == line.npos, line.find(" request[") == line.npos)
+            << "the program takes the name that the platform's library has set: " << line;
         if (const std::size_t at = line.find("info: request: "); at != line.npos) {
             lines.push_back(line.substr(at));
         }
@@ -100,7 +103,8 @@ TEST(Host, LogsRequestsWhileThatIsWanted) {
     EXPECT_THAT(lines, testing::ElementsAre(
                            testing::MatchesRegex(".*Test/Success" + from + "200 after [0-9]+ ms, account guest"),
                            testing::MatchesRegex(".*Test/Crash" + from + "died after [0-9]+ ms, account guest"),
-                           testing::MatchesRegex(".*: -" + from + "404 after [0-9]+ ms, account -")));
+                           testing::MatchesRegex(".*: -" + from + "404 after [0-9]+ ms, account -"),
+                           testing::MatchesRegex(".*Test/Throw" + from + "500 after [0-9]+ ms, account guest")));
 }
 
 TEST_F(RunningHost, RepeatsSigtermUntilAHandlerListens) {
