@@ -14,7 +14,7 @@ namespace lookhaven::admin {
 
 namespace {
 
-// Its value is the invitation as JSON; empty once it was accepted.
+// Its value is the invitation as JSON; empty once it was accepted and nobody may ask again.
 constexpr const char* kInvitationSetting = "pairing_invitation";
 
 [[noreturn]] void Refuse() {
@@ -31,10 +31,13 @@ Json::Value FindInvitation(store::Store& store, const base::BootTime& now) {
     return invitation;
 }
 
-// The same, where the secret belongs to it.
-Json::Value FindInvitation(store::Store& store, std::string_view secret, const base::BootTime& now) {
+// The same, where the secret belongs to it, and nobody has accepted it but by this attempt.
+Json::Value FindInvitation(store::Store& store, std::string_view secret, std::string_view attempt,
+                           const base::BootTime& now) {
     Json::Value invitation = FindInvitation(store, now);
-    if (invitation["digest"] != store::Digest(secret)) {
+    const bool is_free = !invitation.isMember("attempt");
+    if (invitation["digest"] != store::Digest(secret) ||
+        (!is_free && invitation["attempt"] != store::Digest(attempt))) {
         Refuse();
     }
     return invitation;
@@ -50,6 +53,26 @@ Actor ActorOf(store::Store& store, const Json::Value& invitation, const std::str
         actor.name = user ? user->name : "";
     }
     return actor;
+}
+
+// Makes the pairing, and notes in the invitation who may ask again, and for what.
+std::string MakePairing(store::Store& store, const Actor& actor, Json::Value invitation, std::string_view attempt) {
+    const NewPairing made = AdmitServer(store, actor, invitation["name"].asString());
+    invitation["attempt"] = store::Digest(attempt);
+    invitation["server"] = made.server.id;
+    invitation["shared"] = store::Digest(made.secret);
+    store::Settings(store).Set(kInvitationSetting, attempt.empty() ? "" : base::OneLineJson(invitation));
+    return made.secret;
+}
+
+// The secret of the pairing that was made, while it is the one between the two hosts.
+std::string FindPairing(store::Store& store, const Actor& actor, const Json::Value& invitation) {
+    RequireManager(store, actor);
+    std::string shared = store::RecordingServers(store).FindSecret(invitation["server"].asInt());
+    if (invitation["shared"] != store::Digest(shared)) {
+        Refuse();
+    }
+    return shared;
 }
 
 }  // namespace
@@ -88,16 +111,17 @@ void RequireInvitation(store::Store& store, const base::BootTime& now) {
     FindInvitation(store, now);
 }
 
-std::string AcceptInvitation(store::Store& store, std::string_view secret, const std::string& address,
-                             const base::BootTime& now) {
-    FindInvitation(store, secret, now);  // guessing locks nothing
+std::string AcceptInvitation(store::Store& store, std::string_view secret, std::string_view attempt,
+                             const std::string& address, const base::BootTime& now) {
+    FindInvitation(store, secret, attempt, now);  // guessing locks nothing
     std::string shared;
     try {
         store::InTransaction(store, [&] {
             store::Users(store).Lock();
-            const Json::Value invitation = FindInvitation(store, secret, now);
-            shared = AdmitServer(store, ActorOf(store, invitation, address), invitation["name"].asString()).secret;
-            store::Settings(store).Set(kInvitationSetting, "");
+            const Json::Value invitation = FindInvitation(store, secret, attempt, now);
+            const Actor actor = ActorOf(store, invitation, address);
+            shared = invitation.isMember("attempt") ? FindPairing(store, actor, invitation)
+                                                    : MakePairing(store, actor, invitation, attempt);
         });
     } catch (const Forbidden&) {
         throw InvalidInvitation("the pairing code belongs to an account that is no longer a manager");

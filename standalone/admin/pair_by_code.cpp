@@ -7,6 +7,8 @@
 #include "standalone/remote/camera_list.h"
 #include "standalone/remote/certificate_loader.h"
 #include "standalone/remote/fetch.h"
+#include "standalone/remote/token_code.h"
+#include "standalone/store/sessions.h"
 
 namespace lookhaven::admin {
 
@@ -31,9 +33,10 @@ CannotPair Failed(Reason why) {
         return {why,
                 "the code is wrong, or too much was asked of the other host at once: compare it, or show a new one"};
     case Reason::kUnclear:
-        return {why,
-                "the other host's answer cannot be used: the code may be used up, and a pairing that it had under this "
-                "name may have ended; show a new code there"};
+        return {
+            why,
+            "the other host's answer cannot be used; it may have paired itself already, and ended a pairing that it "
+            "had under this name: try again with the same code"};
     }
     throw std::logic_error("an unknown reason");
 }
@@ -67,11 +70,16 @@ struct Offer {
     std::vector<store::RemoteCamera> cameras;
 };
 
-Offer Accept(const store::RecordingServer& server, const remote::PairingCode& code) {
+// What makes the next attempt with the code the same one to the other host, and nobody else's.
+std::string AttemptOf(store::Store& store, const remote::PairingCode& code) {
+    return remote::TokenCode(store::Sessions(store).Key(), "lookhaven pairing attempt 1\n" + code.secret);
+}
+
+Offer Accept(const store::RecordingServer& server, const remote::PairingCode& code, const std::string& attempt) {
     try {
-        const Json::Value data = remote::DataInAnswer(
-            remote::FetchJson({server.address, server.port, FirstOf(server.certificate)},
-                              {"api=VEXO.Pairing&version=1&method=Accept", "", "code=" + code.secret}));
+        const Json::Value data = remote::DataInAnswer(remote::FetchJson(
+            {server.address, server.port, FirstOf(server.certificate)},
+            {"api=VEXO.Pairing&version=1&method=Accept", "", "code=" + code.secret + "&attempt=" + attempt}));
         return {data["secret"].asString(), remote::CamerasIn(data["camera"])};
     } catch (const remote::WrongCertificate&) {
         throw Failed(Reason::kCertificate);
@@ -100,8 +108,9 @@ PairingOutcome PairByCode(const Records& records, const Actor& actor, store::Rec
     if (!confirmed) {
         RequireSameServer(records.open(), server);
     }
+    const std::string attempt = AttemptOf(records.open(), code);
     records.close();
-    const Offer offer = Accept(server, code);
+    const Offer offer = Accept(server, code, attempt);
     try {
         return {AddServer(records.open(), actor, server, offer.secret, offer.cameras,
                           {.shows_cameras = true, .confirmed = confirmed}),

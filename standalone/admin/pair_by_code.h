@@ -13,7 +13,8 @@
 
 namespace lookhaven::admin {
 
-// Nothing was changed here; there, with kUnclear, a pairing may have been made. A manager can name any address that
+// Nothing was changed here; there, with kUnclear, a pairing may have been made, which the next attempt with the same
+// code finds. A manager can name any address that
 // this machine reaches, so the text says no more of what answers there than the reason.
 class CannotPair : public std::runtime_error {
   public:
@@ -22,7 +23,7 @@ class CannotPair : public std::runtime_error {
         kCertificate,  // it shows another certificate, or one that has expired
         kCode,         // wrong, used, expired, or replaced by a newer one
         kTooMany,      // wrong, after many others from this host's network; or its web server was asked too much
-        kUnclear,      // the code was sent, and may be used up there
+        kUnclear,      // the code was sent; nobody else can use it, if it was taken
     };
 
     CannotPair(Reason why, const std::string& text) : std::runtime_error(text), why_(why) {}

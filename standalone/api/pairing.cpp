@@ -47,7 +47,7 @@ std::string TryCode(const Call& call, const std::string& address) {
     const base::BootTime now = base::TimeSinceBoot();
     admin::RequireInvitation(call.Records(), now);
     try {
-        return admin::AcceptInvitation(call.Records(), code, address, now);
+        return admin::AcceptInvitation(call.Records(), code, call.Parameter("attempt").asString(), address, now);
     } catch (const admin::InvalidInvitation&) {
         // Only a wrong code counts: others in the other host's network must not block the right one.
         CountAttempt(call, kCode);
@@ -56,7 +56,7 @@ std::string TryCode(const Call& call, const std::string& address) {
 }
 
 std::string Accept(const Call& call) {
-    RequireNotInQuery(call, {"code"});
+    RequireNotInQuery(call, {"code", "attempt"});
     const std::string address(call.request.Header("REMOTE_ADDR"));
     const base::Installation& installation = call.context.Installation();
     try {

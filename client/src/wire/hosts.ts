@@ -50,7 +50,7 @@ const kRefusals: Record<string, string> = {
     "What answers at this address is not the host that shows the code: its certificate is another one, or has expired. The code was not sent.",
   code: "The other host does not take this code (any more): it is valid once, for ten minutes, until a newer one is shown.",
   tooMany: "The code is wrong, or too much was asked of the other host at once. Please compare it, or show a new one there.",
-  unclear: "The other host’s answer cannot be used. The code may be used up, and a pairing that it had under this name may have ended: show a new code there.",
+  unclear: "The other host’s answer cannot be used. It may have paired itself already, and ended a pairing that it had under this name: try again with the same code.",
 };
 
 export class Hosts {

@@ -42,9 +42,10 @@ class Pairing : public store::StoreTest {
         return ParsePairingCode(Invite(store_, manager_, name, kFacts, now)).secret;
     }
     // "paired", "invalid" or "name".
-    static std::string Try(store::Store& store, const std::string& secret, const base::BootTime& now = At(0)) {
+    static std::string Try(store::Store& store, const std::string& secret, const base::BootTime& now = At(0),
+                           const std::string& attempt = "") {
         try {
-            const std::string shared = AcceptInvitation(store, secret, "192.0.2.9", now);
+            const std::string shared = AcceptInvitation(store, secret, attempt, "192.0.2.9", now);
             return store::RecordingServers(store).InboundPeerSecrets().back() == shared ? "paired" : "";
         } catch (const InvalidInvitation&) {
             return "invalid";
@@ -111,6 +112,20 @@ TEST_P(Pairing, IsMadeOnceByAValidCodeAlone) {
                             "ada@192.0.2.9 server.admit Watcher (1) " + record + R"(,"secret":"new"})",
                             R"(ada@192.0.2.7 server.invite Watcher {"minutes":10})",
                             R"(ada@192.0.2.7 server.invite Watcher {"minutes":10})"));
+}
+
+TEST_P(Pairing, IsFoundAgainByWhoeverMadeIt) {
+    const std::string secret = NewSecret();
+    const std::string attempt(64, 'a');
+    const std::string shared = AcceptInvitation(store_, secret, attempt, "192.0.2.9", At(0));
+    const std::size_t entries = Entries().size();
+    EXPECT_EQ(AcceptInvitation(store_, secret, attempt, "192.0.2.9", At(9)), shared) << "the answer was lost";
+    EXPECT_EQ(Entries().size(), entries) << "nothing was changed";
+    EXPECT_EQ(Try(store_, secret), "invalid");
+    EXPECT_EQ(Try(store_, secret, At(0), std::string(64, 'b')), "invalid") << "somebody who has read the code";
+    EXPECT_EQ(Try(store_, secret, At(10 * kMinute), attempt), "invalid");
+    AdmitServer(store_, manager_, "Watcher");
+    EXPECT_EQ(Try(store_, secret, At(0), attempt), "invalid") << "the new secret is not for whoever had the old one";
 }
 
 TEST_P(Pairing, EndsWithTheRightOfWhoeverAskedForTheCode) {

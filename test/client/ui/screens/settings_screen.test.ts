@@ -163,7 +163,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
       ["certificate", /was not sent/],
       ["code", /valid once/],
       ["tooMany", /compare it/],
-      ["unclear", /may be used up/],
+      ["unclear", /same code/],
     ] as const;
     for (const [why, said] of refusals) {
       setup.whyNoHost = why;
