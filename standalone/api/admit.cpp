@@ -33,6 +33,7 @@ bool IsCrossSite(const http::Request& request) {
     return scheme_end == origin.npos || origin.substr(scheme_end + 3) != request.Header("HTTP_HOST");
 }
 
+constexpr int kAboveTokens = -1;  // this is the monitors', and accounts are positive
 constexpr std::chrono::milliseconds kSearchPoll{10};
 constexpr std::chrono::seconds kSearchWait{10};
 
@@ -80,7 +81,7 @@ CostClass CostClassOf(const Call& call) {
     const bool streams_footage = call.api == kEventApi.name && call.method == "Stream";
     const bool is_light = reads_preferences || streams_footage || call.api == kAuthApi.name ||
                           call.api == kPlaybackApi.name || call.api == kRelayApi.name || call.api == kServerApi.name ||
-                          call.api == kSystemApi.name || call.api == kCameraApi.name;
+                          call.api == kSystemApi.name || call.api == kCameraApi.name || call.api == kTokenApi.name;
     return is_light ? CostClass::kLittle : CostClass::kSearch;
 }
 
@@ -112,6 +113,11 @@ std::optional<binding::Login> FindLogin(const Call& call) {
 }
 
 void Admit(const Call& call, const RequestLimits& limits) {
+    if (call.token) {
+        Occupy(call.slots, call.slot, kAboveTokens - call.token->id, limits.per_user, limits.without_managers);
+        AwaitSearch(call, limits.searches_per_user);
+        return;
+    }
     call.context.Restrict(binding::RestrictionsOf(call.Parameter("privData")));
     if (!call.login) {
         if (call.api != kSelfAdmittingApi) {

@@ -34,7 +34,8 @@ enum class CostClass {
 };
 CostClass CostClassOf(const Call& call);
 
-// Makes the call's login the caller of this process, and narrows its rights by "privData". Throws Failure 401 without
+// Makes the call's login the caller of this process, and narrows its rights by "privData"; with an access token, nobody
+// is the caller, who has no rights but the token's. Throws Failure 401 without
 // a session, except at the API that authenticates its callers itself; 503 beyond a limit. Of the searches of a user,
 // those beyond the limit wait, ten seconds at most.
 void Admit(const Call& call, const RequestLimits& limits);

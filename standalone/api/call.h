@@ -17,6 +17,7 @@
 #include "standalone/http/answer.h"
 #include "standalone/http/request.h"
 #include "standalone/http/request_counters.h"
+#include "standalone/store/access_tokens.h"
 
 namespace lookhaven::api {
 
@@ -33,8 +34,9 @@ struct Call {
     std::string method;
     Parameters parameters;
     std::map<std::string, std::string> cookies;
-    std::optional<binding::Login> login;  // of the cookie's session
-    bool is_forwarded = false;            // by another host of the same store
+    std::optional<binding::Login> login;      // of the cookie's session
+    std::optional<store::AccessToken> token;  // in place of a session
+    bool is_forwarded = false;                // by another host of the same store
 
     binding::RequestContext& context;
     control::SlotTable& slots;

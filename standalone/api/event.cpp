@@ -65,12 +65,23 @@ std::string Get(const Call& call) {
 }
 
 // The caller, who may report.
-store::Reporter RequireReporter(const Call& call) {
+store::Reporter RequireReporter(const Call& call, store::MarkKind kind) {
+    if (call.token) {
+        if (!call.token->MayReport(kind)) {
+            throw Failure(403, "this access token may not report events of this kind");
+        }
+        return call.token->AsReporter();
+    }
     const auto user = store::Users(call.Records()).Find(static_cast<int>(call.context.Caller()));
     if (!user || (!user->may_mark_as_viewer && !binding::IsManager())) {
         throw Failure(403, "this account may not report events");
     }
     return {user->id, user->name};
+}
+
+bool MayReportAt(const Call& call, int camera) {
+    return call.token ? call.token->camera_ids.contains(camera)
+                      : binding::MayUse(camera, store::CameraAccess::kPlayback);
 }
 
 // When it happened: seconds, or a date and time that say their zone.
@@ -110,8 +121,8 @@ std::string Report(const Call& call) {
     if (camera < 1 || start_s < 1 || length_s < 0 || length_s > store::kMaxMarkSeconds) {
         throw Failure(400, "camera, start or length is out of its bounds");
     }
-    const store::Reporter reporter = RequireReporter(call);
-    if (!binding::MayUse(camera, store::CameraAccess::kPlayback) || !store::Cameras(call.Records()).Find(camera)) {
+    const store::Reporter reporter = RequireReporter(call, *kind);
+    if (!MayReportAt(call, camera) || !store::Cameras(call.Records()).Find(camera)) {
         throw Failure(404, kNoSuchCamera);
     }
     RequirePlausible(call, camera, start_s, now_s);

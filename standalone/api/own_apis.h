@@ -47,6 +47,7 @@ extern const OwnApi kPlaybackApi;  // controls a running player of the caller's 
 extern const OwnApi kRelayApi;     // the live view of a paired host's camera on this host's origin
 extern const OwnApi kServerApi;    // the hosts that this one is paired with, for managers
 extern const OwnApi kSystemApi;    // health, metrics, checks, audit log and settings of the installation
+extern const OwnApi kTokenApi;     // access tokens of analytics boxes and POS terminals, for managers
 extern const OwnApi kUserApi;      // accounts, their rights and sessions; everybody's own account
 
 // Null when there is no such API.

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include "standalone/api/admit.h"
+#include "standalone/api/bearer.h"
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/forward.h"
 #include "standalone/api/own_apis.h"
@@ -28,22 +29,28 @@ Call ReadCall(const base::Installation& installation, const http::RequestCounter
               .parameters = ReadQuery(request),
               .cookies = ReadCookies(request),
               .login = {},
+              .token = {},
               .is_forwarded = is_forwarded,
               .context = binding::RequestContext::Current(),
               .slots = slots,
               .slot = slot,
               .counters = counters};
     // The session comes first: nobody without one may cost more than a short request.
-    call.login = FindLogin(call);
+    call.token = FindAccessToken(call);
+    if (call.token) {
+        base::SetLogAccount(call.token->AsReporter().name);
+    } else {
+        call.login = FindLogin(call);
+    }
     if (call.login) {
         base::SetLogAccount(call.login->account);
         control::SlotTable::SetAccount(slot, call.login->account);
     }
     const std::size_t body_bytes = request.body.size() + request.unread_body_bytes;
-    if (!call.login && body_bytes > http::kMaxBodyWithoutSession) {
+    if (!call.login && !call.token && body_bytes > http::kMaxBodyWithoutSession) {
         throw SessionNeeded(call.Parameter("api") == kAuthApi.name);
     }
-    const bool is_picture = IsPictureUpload(call);
+    const bool is_picture = !call.token && IsPictureUpload(call);
     if (is_picture && call.login && !call.login->is_manager) {
         throw Failure(403, kManagersOnly);
     }
@@ -57,7 +64,7 @@ Call ReadCall(const base::Installation& installation, const http::RequestCounter
     call.api = call.Parameter("api").asString();
     call.version = call.Parameter("version").asInt();
     call.method = call.Parameter("method").asString();
-    if (const Json::Value& camera = call.Parameter("camera"); call.login && camera.isInt()) {
+    if (const Json::Value& camera = call.Parameter("camera"); (call.login || call.token) && camera.isInt()) {
         base::SetLogCamera(camera.asInt());
     }
     return call;

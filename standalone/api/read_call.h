@@ -14,9 +14,9 @@ namespace lookhaven::api {
 
 constexpr const char* kManagersOnly = "only a manager may do this";
 
-// Reads query and cookies, finds the session, then reads the body, whose limit depends on the two. The call borrows all
-// that it is given. Throws Failure for what is malformed, too large, or needs a session; Json::Exception for parameters
-// of the wrong type; store::StoreError.
+// Reads query and cookies, finds the access token or session, then reads the body, whose limit depends on them. The
+// call borrows all that it is given. Throws Failure for what is malformed, too large, or needs a session;
+// Json::Exception for parameters of the wrong type; store::StoreError.
 Call ReadCall(const base::Installation& installation, const http::RequestCounters& counters, http::Request& request,
               control::SlotTable& slots, control::Slot& slot);
 

@@ -13,6 +13,7 @@
 #include <unistd.h>
 
 #include "standalone/admin/change.h"
+#include "standalone/api/bearer.h"
 #include "standalone/api/decoder_sandbox.h"
 #include "standalone/api/emap_setup.h"
 #include "standalone/api/forward.h"
@@ -149,6 +150,9 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
         throw Failure(405, "GET and POST only");
     }
     Call call = ReadCall(service.installation, service.counters, request, slots, slot);
+    if (call.token) {
+        RequireReport(call);
+    }
     const OwnApi* own = FindOwnApi(call.api);
     const EntryFunction entry = own == nullptr ? service.modules.Find(call.api, call.version, call.method) : nullptr;
     if (own == nullptr && entry == nullptr) {

@@ -27,6 +27,22 @@ struct SessionFilter::Page {
     }
 };
 
+namespace {
+
+bool HoldsSecret(std::string_view header, std::string_view key) {
+    for (std::size_t at = 0; at < header.size(); ++at) {
+        const std::size_t end = std::min(header.find_first_not_of(base::kHexDigits, at), header.size());
+        const std::string_view text = header.substr(at, end - at);
+        if (key.empty() ? store::Sessions::MayBeSecret(text) : store::Sessions::MayBeSecret(text, key)) {
+            return true;
+        }
+        at = end;
+    }
+    return false;
+}
+
+}  // namespace
+
 SessionFilter::SessionFilter() {
     void* memory = ::mmap(nullptr, sizeof(Page), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
     if (memory == MAP_FAILED) {
@@ -48,16 +64,7 @@ void SessionFilter::Learn(const std::string& key) {
 
 bool SessionFilter::MayHaveSession(const http::Request& request) const {
     const std::string_view key = page_->Key();
-    const std::string_view cookies = request.Header("HTTP_COOKIE");
-    for (std::size_t at = 0; at < cookies.size(); ++at) {
-        const std::size_t end = std::min(cookies.find_first_not_of(base::kHexDigits, at), cookies.size());
-        const std::string_view text = cookies.substr(at, end - at);
-        if (key.empty() ? store::Sessions::MayBeSecret(text) : store::Sessions::MayBeSecret(text, key)) {
-            return true;
-        }
-        at = end;
-    }
-    return false;
+    return HoldsSecret(request.Header("HTTP_COOKIE"), key) || HoldsSecret(request.Header("HTTP_AUTHORIZATION"), key);
 }
 
 void SessionFilter::Close() {

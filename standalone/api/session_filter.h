@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tells forged session cookies from real ones before a request has a process, at the cost of a hash.
+// Tells forged session cookies and access tokens from real ones before a request has a process, at the cost of a hash.
 //
 // Why so        A forged cookie would otherwise make the host fork, open the store and read a body of
 //               megabytes. The host itself cannot open the store, so a child that can hands it the key.
@@ -24,8 +24,8 @@ class SessionFilter {
     // store has been replaced, which gives it another key.
     void Learn(const std::string& key);
 
-    // False: no cookie carries a secret of this store, so there is no session. True says only that one may exist; it
-    // may have ended. Until the key is known, any well-formed secret counts.
+    // False: no cookie or access token is a secret of this store, so there is no session. True says only that one may
+    // exist; it may have ended. Until the key is known, any well-formed secret counts.
     bool MayHaveSession(const http::Request& request) const;
 
     // For a request process: from now on nothing here can be reached, by code that a picture has taken over, either.

@@ -14,6 +14,7 @@ void AddSetupAddress(CLI::App& program, const Console& console);
 void AddAudit(CLI::App& program, const Console& console);
 void AddCamera(CLI::App& program, const Console& console);
 void AddUser(CLI::App& program, const Console& console);
+void AddToken(CLI::App& program, const Console& console);
 void AddCertificate(CLI::App& program, const Console& console);
 void AddLog(CLI::App& program, const Console& console);
 void AddGroup(CLI::App& program, const Console& console);

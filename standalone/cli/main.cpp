@@ -87,9 +87,10 @@ int Run(int argc, char** argv) {
     program.add_option("--home", console.home_option,
                        "The state folder (default: " + base::DefaultHome().string() + ")");
     program.add_flag("--json", console.json, "Answer in JSON");
-    for (const auto add : {AddInit,   AddSetupAddress, AddAudit, AddCamera, AddUser,   AddCertificate, AddLog,
-                           AddGroup,  AddMount,        AddEvent, AddExport, AddEmap,   AddDevices,     AddHosts,
-                           AddServer, AddSetting,      AddStore, AddBackup, AddVerify, AddDemo,        AddDoctor}) {
+    for (const auto add :
+         {AddInit,    AddSetupAddress, AddAudit,  AddCamera, AddUser, AddToken,   AddCertificate, AddLog,
+          AddGroup,   AddMount,        AddEvent,  AddExport, AddEmap, AddDevices, AddHosts,       AddServer,
+          AddSetting, AddStore,        AddBackup, AddVerify, AddDemo, AddDoctor}) {
         add(program, console);
     }
     CommandGroup<>(program, console).Add("version", "Prints the version", ShowVersion);

@@ -36,7 +36,8 @@ constexpr std::int64_t kMaxMarkSeconds = 3600;
 constexpr std::size_t kMaxMarkTextBytes = 8192;
 constexpr int kMarksPerDay = 5000;  // of an account, unless the setting marks_per_day says otherwise
 
-// Whose word a mark is: an account of the web API, or the command line, which has no id.
+// Whose word a mark is: an account of the web API, an access token, whose number is negative, or the command line,
+// which has none.
 struct Reporter {
     int user_id = 0;
     std::string name;
@@ -77,8 +78,9 @@ struct MarkFilter {
 class TooManyMarks : public std::runtime_error {
   public:
     TooManyMarks()
-        : std::runtime_error("this account has reported as many events as it may within 24 hours, or as may wait for "
-                             "their footage") {}
+        : std::runtime_error(
+              "this account or access token has reported as many events as it may within 24 hours, or as may wait for "
+              "their footage") {}
 };
 
 class Marks {

@@ -275,6 +275,16 @@ constexpr const char* kMarkWordsByCameraOnPostgresql[] = {
     "create index marks_by_words on marks using gin (mark_words(text), (array[camera_id]))",
 };
 
+// What a device presents is found by its handle; the hash is that of the whole secret.
+constexpr const char* kAccessTokens[] = {
+    "insert into counters (name, value) values ('token', 0)",
+    ("create table access_tokens (id integer not null primary key, name text not null unique,"
+     " may_alert integer not null, may_pos integer not null, created_s bigint not null, creator text not null,"
+     " last_use_s bigint not null, expires_s bigint not null, handle text not null unique, secret_hash text not null)"),
+    ("create table access_token_cameras (token_id integer not null references access_tokens (id) on delete cascade,"
+     " camera_id integer not null references cameras (id) on delete cascade, primary key (token_id, camera_id))"),
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -299,6 +309,7 @@ constexpr Migration kMigrations[] = {
      .statements = {},
      .on_postgresql = kMarkWordsByCameraOnPostgresql,
      .is_addition = true},
+    {.purpose = "access tokens", .statements = kAccessTokens, .is_addition = true},
 };
 
 }  // namespace

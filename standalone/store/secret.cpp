@@ -38,6 +38,10 @@ std::string Hash(std::string_view key, std::string_view text) {
     return base::ToHex(hash);
 }
 
+bool AreEqual(std::string_view given, const std::string& expected) {
+    return given.size() == expected.size() && sodium_memcmp(given.data(), expected.data(), given.size()) == 0;
+}
+
 }  // namespace
 
 std::string HashPassword(std::string_view password) {
@@ -73,8 +77,16 @@ std::string Tag(std::string_view key, std::string_view text) {
 }
 
 bool TagMatches(std::string_view key, std::string_view text, std::string_view tag) {
-    const std::string expected = Tag(key, text);
-    return tag.size() == expected.size() && sodium_memcmp(tag.data(), expected.data(), tag.size()) == 0;
+    return AreEqual(tag, Tag(key, text));
+}
+
+std::string NewSecret(std::string_view key) {
+    const std::string random = RandomHex(kRandomDigits / 2);
+    return random + Tag(key, random);
+}
+
+bool DigestMatches(std::string_view digest, std::string_view text) {
+    return AreEqual(digest, Digest(text));
 }
 
 }  // namespace lookhaven::store

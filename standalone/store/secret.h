@@ -29,4 +29,12 @@ std::string Tag(std::string_view key, std::string_view text);
 // Takes the same time wherever the tag differs.
 bool TagMatches(std::string_view key, std::string_view text, std::string_view tag);
 
+// 64 hex digits: random ones, and behind them their tag.
+constexpr std::size_t kSecretDigits = 64;
+constexpr std::size_t kRandomDigits = kSecretDigits - kTagDigits;
+std::string NewSecret(std::string_view key);
+
+// Takes the same time wherever the digest differs.
+bool DigestMatches(std::string_view digest, std::string_view text);
+
 }  // namespace lookhaven::store

@@ -23,18 +23,11 @@ struct Mapping<Session> {
 
 namespace {
 
-constexpr std::size_t kSecretDigits = 64;
-constexpr std::size_t kRandomDigits = kSecretDigits - kTagDigits;
 constexpr std::size_t kHandleBytes = 16;
 constexpr std::int64_t kTouchEveryS = 60;
 
 std::int64_t EndOf(const SessionLifetime& lifetime, std::int64_t created_s, std::int64_t now_s) {
     return std::min(now_s + lifetime.idle_s, created_s + lifetime.absolute_s);
-}
-
-std::string NewSecret(std::string_view key) {
-    const std::string random = RandomHex(kRandomDigits / 2);
-    return random + Tag(key, random);
 }
 
 }  // namespace

@@ -131,7 +131,8 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
 }
 
 void CliTest::UndoLastMigration() {
-    Sql({"drop table emap_pictures", "update schema_version set version = version - 1"});
+    Sql({"drop table access_token_cameras", "drop table access_tokens", "delete from counters where name = 'token'",
+         "update schema_version set version = version - 1"});
 }
 
 void CliTest::SetUpDemo() {

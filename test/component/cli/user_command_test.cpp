@@ -47,6 +47,23 @@ TEST_F(DemoTest, AccountsAreAddedChangedAndRemoved) {
           {"user remove bob --json", 66, "\"code\" : 66"}});
 }
 
+TEST_F(DemoTest, AccessTokensAreAddedListedAndRemoved) {
+    Play({{"token add Till --camera 1 --kind pos --expires 90d", 0, "\nlht_"},
+          {"token add Till --camera 1", 65, "already an access token"},
+          {"token add Box --camera 1 --camera 2 --json", 0, "\"expires\" : 0"},
+          {"token add Other --camera 99", 66, "no camera 99"},
+          {"token add Other --camera 1 --kind fire", 64, "--kind"},
+          {"token add Other --camera 1 --expires 0", 64, "without --expires"},
+          {"token add Other --camera 1 --expires 9999d", 65, "3650 days"},
+          {"token add Other", 64, "--camera"},
+          {"token list", 0, "alert pos", "lht_"},
+          {"token list --json", 0, "\"Till\"", "lht_"},
+          {"audit --json", 0, "token.add", "lht_"},
+          {"token remove Till", 0, "stays"},
+          {"token remove Till", 66, "no access token Till"},
+          {"token list", 0, "never", "Till"}});
+}
+
 TEST_F(DemoTest, ATerminalNeverShowsAPassword) {
     Outcome outcome = RunOnTerminal("user add bob", {"bob-s3cret", "bob-s3cret"});
     EXPECT_EQ(outcome.code, 0) << outcome.text;

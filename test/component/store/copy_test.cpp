@@ -3,6 +3,7 @@
 // Copying a store's records into another one, on the same engine or the other.
 #include "standalone/store/copy.h"
 
+#include "standalone/store/access_tokens.h"
 #include "standalone/store/connection.h"
 #include "standalone/store/emap_pictures.h"
 #include "standalone/store/emaps.h"
@@ -34,6 +35,11 @@ class CopyTest : public StoreTest {
         Preferences(store_).Change(user, [](const std::string&) { return R"({"layout":"2"})"; });
         Settings(store_).Set("place", "Zürich :name $1 \\");
         Emaps(store_).Add({.name = "Ground floor"});
+        AccessToken till;
+        till.name = "till";
+        till.camera_ids = {2};
+        till.may_pos = true;
+        token_ = AccessTokens(store_).Add(till).secret;
         EmapPictures(store_).Put("1-a.png", kPicture, 1);
         EmapPictures(store_).Put("1-b.png", "b", 1);
         std::vector<Event> events;
@@ -60,6 +66,7 @@ class CopyTest : public StoreTest {
         }
     }
 
+    std::string token_;
     const std::string kPicture = std::string(100'000, '\xff') + std::string("\0'", 2);
     static constexpr int kEvents = 1'100;  // more than one fetch of a cursor
 };
@@ -78,6 +85,7 @@ TEST_P(CopyTest, TakesAllRecordsToEitherEngineAndGoesOnCounting) {
         EXPECT_EQ(Preferences(copy).Find(1), R"({"layout":"2"})");
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kExport), ElementsAre(2));
         EXPECT_THAT(Users(copy).DeniedCameras(1, CameraAccess::kPlayback), testing::IsEmpty());
+        EXPECT_THAT(AccessTokens(copy).FindBySecret(token_).value().camera_ids, ElementsAre(2));
         EXPECT_EQ(EmapPictures(copy).Find("1-a.png"), kPicture);
         EXPECT_EQ(EmapPictures(copy).Find("1-b.png"), "b");
         EXPECT_EQ(Settings(copy).Find("place"), Settings(store_).Find("place"));

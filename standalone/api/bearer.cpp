@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "standalone/api/bearer.h"
+
+#include "standalone/api/login_log.h"
+#include "standalone/api/own_apis.h"
+#include "standalone/api/password_check.h"
+#include "standalone/base/clock.h"
+#include "standalone/base/log.h"
+#include "standalone/base/text.h"
+
+namespace lookhaven::api {
+
+namespace {
+
+constexpr const char* kSecretName = "access token";
+constexpr const char* kWrong = "wrong or expired access token";  // packaging/fail2ban knows the sentence
+
+[[noreturn]] void Refuse(const Call& call, const std::string& who) {
+    const auto log = [&](const char* reason) {
+        LogRefused(call.context.Installation(), who, call.request.Header("REMOTE_ADDR"), reason);
+    };
+    try {
+        CountAttempt(call, kSecretName);
+    } catch (const Failure& failure) {
+        log(failure.what());
+        throw;
+    } catch (const store::StoreError& error) {  // a store that can only be read refuses as well
+        base::LogWarning(std::string("cannot count a wrong access token: ") + error.what());
+    }
+    log(kWrong);
+    throw Failure(401, kWrong);
+}
+
+std::optional<std::string_view> BearerOf(const http::Request& request) {
+    constexpr std::string_view kScheme = "bearer ";
+    const std::string_view header = request.Header("HTTP_AUTHORIZATION");
+    if (base::LowerAscii(header.substr(0, kScheme.size())) != kScheme) {
+        return std::nullopt;
+    }
+    const std::string_view bearer = header.substr(kScheme.size());
+    return bearer.starts_with(store::AccessTokens::kPrefix) ? std::optional(bearer) : std::nullopt;
+}
+
+}  // namespace
+
+std::optional<store::AccessToken> FindAccessToken(const Call& call) {
+    const std::optional<std::string_view> bearer = BearerOf(call.request);
+    if (!bearer) {
+        return std::nullopt;
+    }
+    store::AccessTokens tokens(call.Records());
+    std::optional<store::AccessToken> token = tokens.FindBySecret(*bearer);
+    const std::int64_t now_s = base::WallSeconds();
+    if (!token || token->IsExpired(now_s)) {
+        Refuse(call, token ? token->AsReporter().name : kSecretName);
+    }
+    try {
+        tokens.Touch(*token, now_s);
+    } catch (const store::StoreError& error) {  // what it asks for fails for itself
+        base::LogWarning(std::string("cannot note that an access token is in use: ") + error.what());
+    }
+    return token;
+}
+
+void RequireReport(const Call& call) {
+    if (call.api != kEventApi.name || call.version != 1 || call.method != "Mark") {
+        throw Failure(403, "an access token may report events and nothing else");
+    }
+}
+
+}  // namespace lookhaven::api
