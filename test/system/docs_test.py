@@ -78,7 +78,10 @@ class DocsTest(unittest.TestCase):
                     method, target = line.split(" ", 1)
                     # A session that an example may end, but not so many log-ins that the host refuses one.
                     log_in = server.login if page.name == "auth.md" else server.session
-                    headers = {"Cookie": f"id={log_in(account)}"} if account else {}
+                    headers = {"Cookie": f"id={log_in(account)}"} if account not in ("", "token") else {}
+                    if account == "token":
+                        token = json.loads(server.cli("token", "add", "Till 1", "--camera", "1", "--json"))
+                        headers["Authorization"] = f"Bearer {token['secret']}"
                     form = "json" if body.startswith("{") else "x-www-form-urlencoded"
                     headers["Content-Type"] = "image/png" if body.startswith("@") else f"application/{form}"
                     body = PNG if body.startswith("@") else body

@@ -2,6 +2,7 @@
 //
 // Cameras, groups, e-maps, accounts, mounts and settings, with revisions, and the password "right" of the manager.
 
+import type { AccessToken } from "../../../client/src/wire/access_tokens";
 import type { CameraRecord } from "../../../client/src/wire/camera_setup";
 import type { DeviceRecord } from "../../../client/src/wire/devices";
 import type { EmapRecord } from "../../../client/src/wire/emap_setup";
@@ -22,6 +23,7 @@ const failed = (code: number, message: string, data: unknown = null): Answer => 
   error: { code, message, data },
 });
 
+export const kTokenSecret = `lht_${"0123456789abcdef".repeat(4)}`;
 /** A valid one. */
 export const kCode = "008J-4CT4-ANK7-F24S-04HM-ASW9-NF6Y-Z93N";
 
@@ -33,6 +35,7 @@ export class FakeSetup {
   /** The account that is logged in, and its sessions. */
   userId = 1;
   readonly session: OpenSession[] = [];
+  readonly token: AccessToken[] = [];
   /** Of each account. */
   readonly preferences = new Map<number, Record<string, unknown>>();
   readonly mount: MountRecord[] = [];
@@ -69,6 +72,12 @@ export class FakeSetup {
     "VEXO.User.EndSessions": (request) => this.#endSessions(request),
     "VEXO.User.Preferences": () => ok({ preferences: this.preferences.get(this.userId) ?? {} }),
     "VEXO.User.SetPreferences": (request) => this.#setPreferences(request),
+    "VEXO.Token.List": () => ok({ token: this.token, camera: this.camera }),
+    "VEXO.Token.Add": (request) => this.#addToken(request),
+    "VEXO.Token.Remove": (request) => {
+      this.token.splice(this.token.findIndex(({ id }) => id === request.id), 1);
+      return this.#note("Token.Remove", request, ok({}));
+    },
     "VEXO.Mount.List": () => ok({ mount: this.mount }),
     "VEXO.Mount.Set": (request) => (request.confirm ? this.#set("mount", request) : ok({ confirm: this.loss })),
     "VEXO.Group.List": () => ok({ group: this.group }),
@@ -100,6 +109,13 @@ export class FakeSetup {
     if (record.revision !== revision) return failed(409, "It was changed meanwhile.", record);
     Object.assign(record, changes, { revision: record.revision + 1 });
     return this.#note(kind, request, ok({ [kind]: record }));
+  }
+
+  #addToken(request: Request): Answer {
+    const { name, camera, kind, reauth } = request as unknown as AccessToken & { reauth: string };
+    if (reauth !== "right") return failed(403, "The password is wrong.");
+    this.token.push({ id: 5, name, camera, kind, created: 1, by: "admin", lastUse: null, expires: null });
+    return this.#note("Token.Add", request, ok({ secret: kTokenSecret }));
   }
 
   #endSessions(request: Request): Answer {

@@ -5,7 +5,7 @@
 
 import type { Page } from "playwright-core";
 import { kNothingDenied } from "../../../../client/src/ui/settings/accounts/rights";
-import { cameraRecord, kCode } from "../../support/fake_setup";
+import { cameraRecord, kCode, kTokenSecret } from "../../support/fake_setup";
 import { hasBrowser, ServedClient } from "../../support/served_client";
 
 describe.skipIf(!hasBrowser)("in a browser", () => {
@@ -264,6 +264,36 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     }
     await vi.waitFor(() => expect(setup.asked[1]).toEqual(["user", { id: 2, revision: 2, password: "long enough", reauth: "right" }]));
     await vi.waitFor(async () => expect(await page.getByLabel("New password").inputValue()).toBe(""));
+  }, 20_000);
+
+  test("an access token is shown once, and goes after a question", async () => {
+    setup.token.length = 0;
+    const page = await open("accounts");
+    await page.getByRole("button", { name: "Add a token…" }).click();
+    const dialog = page.getByRole("dialog", { name: "Add an access token" });
+    const add = dialog.getByRole("button", { name: "Add", exact: true });
+    await dialog.getByLabel("Your own password").fill("right");
+    await dialog.getByLabel("Name").fill("Till");
+    await add.click();
+    await dialog.getByText("Please choose a camera").waitFor();
+    await dialog.getByText("Gate").click();
+    await dialog.getByText("POS transactions", { exact: true }).click();
+    await dialog.getByLabel("Expires").selectOption("in 90 days");
+    await add.click();
+    const shown = page.getByRole("dialog", { name: "The token Till" });
+    await shown.getByText(kTokenSecret).waitFor();
+    await shown.getByRole("button", { name: `Copy ${kTokenSecret}` }).click();
+    await shown.getByRole("button", { name: "Close" }).last().click();
+    const lifetime = 90 * 86_400;
+    expect(setup.asked).toEqual([["Token.Add", { name: "Till", camera: [2], kind: ["pos"], lifetime, reauth: "right" }]]);
+    await page.getByRole("rowheader", { name: "Till" }).waitFor();
+    expect(await page.content()).not.toContain(kTokenSecret);
+    for (const answer of ["Cancel", "Remove"]) {
+      expect(setup.token.length).toBe(1);
+      await page.getByRole("button", { name: "Remove the token Till" }).click();
+      await page.getByRole("dialog", { name: "Remove the token Till?" }).getByRole("button", { name: answer }).click();
+    }
+    await page.getByRole("rowheader", { name: "Till" }).waitFor({ state: "detached" });
   }, 20_000);
 
   test("limits that delete footage are saved when the user has seen how much", async () => {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// All accounts: what each may do, whether it is in use, and when it last was.
+// All accounts: what each may do, whether it is in use, and when it last was. Below them the access tokens.
 
 import { Accounts, type UserList, type UserRecord } from "../../../wire/accounts";
 import { settingsAddress } from "../../route";
@@ -10,6 +10,7 @@ import { element } from "../../widgets/dom";
 import { minuteText } from "../../widgets/text";
 import { emptyState, LoadedPage, type PageContext } from "../page";
 import { kPrivilegeNames, rightsSummary } from "./rights";
+import { TokensPanel } from "./tokens_panel";
 
 export class AccountsPage extends LoadedPage<UserList> {
   constructor(context: PageContext) {
@@ -25,7 +26,8 @@ export class AccountsPage extends LoadedPage<UserList> {
     const sentence =
       "Yours is the only account. Give everyone an account of their own, with only the rights they need.";
     const alone = emptyState("people", sentence);
-    this.show(element("ul", { class: "settings-list" }, ...rows), ...(list.user.length === 1 ? [alone] : []));
+    const tokens = new TokensPanel(this.context.server, this.closed).root;
+    this.show(element("ul", { class: "settings-list" }, ...rows), ...(list.user.length === 1 ? [alone] : []), tokens);
   }
 
   #row(user: UserRecord, list: UserList): HTMLElement {
