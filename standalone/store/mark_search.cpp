@@ -8,7 +8,7 @@
 //               camera as an array of one (it has no other index of words and numbers without an extension); the
 //               planner chooses between it and a walk along the time, and looks the cameras up again as numbers, of
 //               which it knows how many there are.
-// See           schema.cpp, which keeps both in step with the marks.
+// See           mark_words_schema.h, which keeps both in step with the marks.
 #include <algorithm>
 #include <string>
 

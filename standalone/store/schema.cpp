@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/schema.h"
 
+#include "standalone/store/mark_words_schema.h"
+
 namespace lookhaven::store {
 
 namespace {
@@ -198,40 +200,6 @@ constexpr const char* kKeptEvents[] = {
     "create index events_kept on events (camera_id, start_s) where archived = 1",
 };
 
-// The words in texts of marks, which triggers keep in step: start and id of a mark are the row, so that the newest come
-// first out of the index. Its texts are not stored a second time, so that what is removed is told with its words.
-constexpr const char* kMarkWordsOnSqlite[] = {
-    "create virtual table mark_words using fts5(words, tags, content = '', columnsize = 0,"
-    " tokenize = 'unicode61 remove_diacritics 0')",
-    "create trigger mark_words_added after insert on marks when new.text <> '' begin"
-    " insert into mark_words (rowid, words, tags) values"
-    " ((new.start_s << 32) | new.id, new.text, 'c' || new.camera_id || ' k' || new.kind); end",
-    "create trigger mark_words_removed after delete on marks when old.text <> '' begin"
-    " insert into mark_words (mark_words, rowid, words, tags) values"
-    " ('delete', (old.start_s << 32) | old.id, old.text, 'c' || old.camera_id || ' k' || old.kind); end",
-    "insert into mark_words (rowid, words, tags) select (start_s << 32) | id, text, 'c' || camera_id || ' k' || kind"
-    " from marks where text <> '' order by start_s, id",
-};
-
-// Functions, so that index and searches have one form of the words. What stands between words becomes a space, since
-// the parser would take "door/yard" for a path and "12.80" for one number. A database whose locale is C knows
-// small letters and capitals of ASCII alone, so it is told the letters of all scripts, where its server has them. The
-// index's function calls functions of the server alone: maintenance and restoring look nothing up in our schema.
-constexpr const char* kMarkWordsOnPostgresql[] = {
-    R"(do $do$
-declare letters text := case when exists (select 1 from pg_collation where collname = 'und-x-icu')
-    then ' collate "und-x-icu"' else '' end;
-begin
-    execute 'create function mark_small(text text) returns text language sql immutable parallel safe as '
-        || '$small$ select lower(text' || letters || ') $small$';
-    execute 'create function mark_words(text text) returns tsvector language sql immutable parallel safe as '
-        || '$words$ select to_tsvector(''pg_catalog.simple'', regexp_replace(lower(text' || letters || ')' || letters
-        || ', ''[^[:alnum:]]+'', '' '', ''g'')) $words$';
-end $do$)",
-    "create index marks_by_words on marks using gin (mark_words(text))",
-    "create index marks_by_time on marks (start_s, id)",
-};
-
 // One JSON object each.
 constexpr const char* kPreferences[] = {
     ("create table preferences (user_id integer not null primary key references users (id) on delete cascade,"
@@ -267,12 +235,6 @@ constexpr const char* kMountPathsOnPostgresql[] = {
 // For hosts that share the store; content is base64.
 constexpr const char* kEmapPictures[] = {
     ("create table emap_pictures (name text not null primary key, content text not null, touched_s bigint not null)"),
-};
-
-// With the camera in the index of words, for searches whose words are others' cameras'.
-constexpr const char* kMarkWordsByCameraOnPostgresql[] = {
-    "drop index marks_by_words",
-    "create index marks_by_words on marks using gin (mark_words(text), (array[camera_id]))",
 };
 
 // What a device presents is found by its handle; the hash is that of the whole secret.
