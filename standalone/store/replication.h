@@ -18,7 +18,7 @@ struct Replication {
     std::int64_t lag_bytes = 0;  // by which the slowest streaming one is behind
 };
 
-// Nothing for SQLite.
+// Nothing for SQLite. Throws StoreError.
 std::optional<Replication> ReadReplication(Store& store);
 
 }  // namespace lookhaven::store
