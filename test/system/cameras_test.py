@@ -70,7 +70,7 @@ class Cameras(unittest.TestCase):
         refused = probe(address)
         self.assertIn("its TLS certificate is refused", refused)
         self.assertIn("--insecure", refused)
-        self.assertEqual(camera.requests, 0, "nothing is told to whom nobody knows")
+        self.assertEqual(camera.requests, 0, "a host without a trusted certificate learns nothing")
         self.assertIn("MJPEG 64x48", probe("--insecure", address))
 
     def test_redirects_lead_to_the_same_host_only(self):

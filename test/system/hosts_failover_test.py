@@ -156,7 +156,7 @@ class HostsFailoverTest(unittest.TestCase):
                 with self.subTest(account, **query):
                     answers = [host.request(query, account) for host in self.hosts]
                     self.assertEqual({answer.status for answer in answers}, {401 if account is None else 200})
-                    self.assertEqual(len({answer.body for answer in answers}), 1, "the same, whom one asks")
+                    self.assertEqual(len({answer.body for answer in answers}), 1, "the same, whichever host is asked")
             for camera, is_allowed in [*((each, True) for each in allowed), *((each, False) for each in denied)]:
                 event = events[camera]
                 of_footage = [call("VEXO.Picture", "At", camera=camera, time_ms=event["start"] * 1000 + 2000),
@@ -218,9 +218,9 @@ class HostsFailoverTest(unittest.TestCase):
             orders = [subprocess.Popen([BUILD / "bin/lookhaven", "camera", "set", str(camera), "--host", name],
                                        env=host.environment, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
                       for host, name in zip(self.hosts, NAMES)]
-            self.assertIn(0, [order.wait(30) for order in orders], "whoever was slower may be told so")
+            self.assertIn(0, [order.wait(30) for order in orders], "the slower ones may be refused, not all")
             told = int(self.sql(f"select host_id from cameras where id = {camera}")[0][0])
-            wait_until(lambda: camera in self.cameras_by_host()[told - 1], 20, "who was told last has it")
+            wait_until(lambda: camera in self.cameras_by_host()[told - 1], 20, "the host that was named last has it")
             self.wait_until_recorded("it is recorded there alone")
         self.hosts[0].cli("camera", "set", str(camera), "--host", "any")
         self.hosts[0].cli("host", "balance")
@@ -236,7 +236,7 @@ class HostsFailoverTest(unittest.TestCase):
         self.assertEqual({host.request(call(PLAYER, "LoadCamera"), "admin").status for host in self.hosts}, {503})
         self.servers[0].promote()
         self.check_footage(since)
-        self.assertEqual(self.cameras_by_host(), leases, "nobody takes the others for lost")
+        self.assertEqual(self.cameras_by_host(), leases, "no host takes the others for offline")
         self.wait_for_recordings(1)
         self.check_footage(since)
         self.assertTrue(all(host.answers() for host in self.hosts))

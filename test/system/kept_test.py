@@ -39,7 +39,7 @@ class KeptTest(unittest.TestCase):
         self.server.cli("mount", "set", str(mount), "--limit", "1M", "--yes")
         wait_until(lambda: before.keys() & self.finished().keys() == {kept}, 60, "the limit deletes all but what is kept")
         names = {event["name"] for event in before.values()}
-        wait_until(lambda: self.files(names) == {name}, 30, "of the files that of what is kept alone is left")
+        wait_until(lambda: self.files(names) == {name}, 30, "only the file of the kept recording is left")
         picture = self.server.request(call("VEXO.Picture", "At", event=kept), "admin")
         self.assertEqual((picture.status, picture.body[:2]), (200, b"\xff\xd8"))
         self.keep(kept, keep="false")

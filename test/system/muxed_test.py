@@ -96,7 +96,7 @@ class MuxedTest(unittest.TestCase):
                 described = {(head["content-type"], head["x-codecs"], head["x-audio-extra"]) for head, _ in parts}
                 self.assertEqual(described, {("image/H264", "H264;", "")})
         with self.server.live(2, "viewer") as refused:
-            self.assertEqual(refused.response.status, 502, "as a camera that is not there")
+            self.assertEqual(refused.response.status, 502, "as for an unknown camera")
 
     def test_a_stream_ends_when_its_camera_becomes_another_and_begins_anew(self):
         camera = self.server.add_camera("Changing", "test:h264?size=320x240&fps=25")

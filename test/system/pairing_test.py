@@ -121,7 +121,7 @@ class PairingTest(unittest.TestCase):
         self.watcher.forget_sessions()
         with self.relayed_parts(2, "viewer") as parts:
             self.assertEqual({parts.next()[0]["content-type"] for _ in range(20)}, {"image/H264"})
-        self.assertEqual(self.relay(1, "viewer").body, self.relay(77, "viewer").body, "as one that is not there")
+        self.assertEqual(self.relay(1, "viewer").body, self.relay(77, "viewer").body, "as for an unknown camera")
         for what, camera, account, status in [
             ("denied", 1, "viewer", 404), ("not mapped", 77, "admin", 404), ("no session", 1, None, 401)
         ]:

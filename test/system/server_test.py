@@ -219,7 +219,7 @@ os.execv("{program}", ["{program}", *words])
             with server.live(1) as parts:
                 self.assertIn("The web server shows it.", server.cli("certificate", "set", *map(str, own)))
                 self.assertEqual(shown(), own[0].read_text())
-                self.assertFalse(parts.ends(), "who watches goes on")
+                self.assertFalse(parts.ends(), "viewers are not interrupted")
             make_certificate(folder, "other.example", 90)
             offer = {"certificate": own[0].read_text(), "key": own[1].read_text(), "confirm": True, "reauth": PASSWORDS["admin"]}
             answer = server.request(

@@ -68,7 +68,7 @@ class StreamTest(unittest.TestCase):
             before = leftovers(self.server)
             with ThreadPoolExecutor(12) as pool:
                 for done, _ in enumerate(pool.map(cut, plans)):
-                    if done % 50 == 0:  # nginx closes on whoever takes nothing for 30 s
+                    if done % 50 == 0:  # nginx closes connections that take nothing for 30 s
                         [stream.next() for stream in (one, four) for _ in range(10)]
             time.sleep(2)
             after = leftovers(self.server)

@@ -44,7 +44,7 @@ test.each([
   expect(close).toHaveBeenCalledOnce();
 });
 
-test("who has switched it off meanwhile is told nothing", async () => {
+test("sound that was switched off meanwhile reports no failure", async () => {
   const { player } = playerWith(() => never, () => Promise.resolve());
   void player.switchOn();
   player.switchOff();

@@ -18,7 +18,7 @@ test.each([
   else expect(codeProblem(typed)).toBe("");
 });
 
-test("every wrong digit and every two that were swapped are told", () => {
+test("every wrong digit is detected, and any two neighbours that were swapped", () => {
   const plain = kCode.replaceAll("-", "");
   for (let at = 0; at < plain.length; at += 1) {
     for (const digit of "0123456789ABCDEFGHJKMNPQRSTVWXYZ") {

@@ -99,7 +99,7 @@ test("a loopback address is no address for another host", () => {
   expect(names.map((hostname) => ownAddress({ hostname }))).toEqual([null, null, null, "nvr.example", "2001:db8::1"]);
 });
 
-test("what goes with a host is told by user", () => {
+test("the denials that go with a host are listed by user", () => {
   const camera = [{ id: 4, idOnServer: 1, name: "Yard" }];
   const denial = [["ann", "camera", 4], ["bob", "camera", 5], ["ann", "ioModule", 2]].map(([user, kind, id]) => ({ user, kind, id }));
   expect(denialsText({ camera, denial } as never)).toBe("ann: Yard, I/O module 2; bob: camera 5");
