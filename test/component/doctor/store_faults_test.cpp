@@ -20,7 +20,7 @@ TEST_F(DoctorTest, FaultsOfFolderAndStoreAreFoundAndMendedWithoutLoss) {
         {"state folder that its owner may not enter", Shell("chmod 0 " + home_.string()), "does not permit its owner"},
         {"part of it that its owner may not enter", Shell("chmod 600 " + home_.string() + "/run"),
          "run does not permit its owner"},
-        {"folder that others may enter", Shell("chmod 711 " + home_.string()), "open to other users"},
+        {"folder that others may enter", Shell("chmod 701 " + home_.string()), "open to other users"},
         {"open folder", Shell("chmod 755 " + home_.string()), "open to other users"},
         {"readable store", Shell("chmod 644 " + database), "lookhaven.db is open"},
         {"store of root", Shell("chown 0:0 " + database), "lookhaven.db belongs to root", {}, is_root_},
@@ -105,6 +105,12 @@ TEST_F(DoctorTest, WhatIsLessSafeThanItCouldBeIsNotedAndIsNoFault) {
              EXPECT_THAT(Run("doctor --json").text, HasSubstr("\"severity\" : \"note\""));
          },
          "the HTTPS certificate of camera 1 is not verified"},
+        {"disabled mount that nothing is recorded to",
+         [&] {
+             Sql("update recording_plans set mode = 0")();
+             Sql("update mounts set enabled = 0")();
+         },
+         " is disabled\n"},
         {"certificate that expires soon",
          [&] {
              MakeCertificate(90)();
