@@ -9,6 +9,7 @@
 #include <chrono>
 #include <csignal>
 #include <iostream>
+#include <map>
 #include <optional>
 #include <string>
 #include <thread>
@@ -61,15 +62,17 @@ class Recorder {
     void Step(std::int64_t now_s) {
         const std::set<int> held = camera_leases_.Held();
         std::set<int> recorded;
+        std::map<int, std::uint64_t> received;
         for (Camera& camera : cameras_) {
             if (held.contains(camera.id)) {
                 Record(camera, now_s);
                 recorded.insert(camera.id);
+                received[camera.id] = static_cast<std::uint64_t>(now_s * kBytesPerSecond);
             }
         }
         rows_.Refresh(cameras_.size());
         camera_leases_.NoteRecorded(std::move(recorded));
-        camera_leases_.Ask(true);
+        camera_leases_.Ask(store::HostRoom::kFree, received);
         catalog_.Refresh();
     }
 

@@ -2,12 +2,12 @@
 #include "standalone/admin/hosts.h"
 
 #include <algorithm>
-#include <map>
 #include <vector>
 
 #include "standalone/admin/change.h"
 #include "standalone/store/camera_leases.h"
 #include "standalone/store/events.h"
+#include "standalone/store/host_loads.h"
 #include "standalone/store/mounts.h"
 
 namespace lookhaven::admin {
@@ -20,32 +20,6 @@ store::Host RequireHost(store::Store& store, const std::string& name) {
         throw store::NotFound("there is no host \"" + name + "\": see lookhaven host list");
     }
     return *std::move(host);
-}
-
-struct Share {
-    std::size_t cameras = 0;
-    std::vector<int> floating;  // of these, what may move
-};
-
-// The shares, by host id, of the hosts between which cameras may be moved.
-std::map<int, Share> SharesOf(store::Store& store, const std::vector<store::Host>& hosts) {
-    std::map<int, Share> shares;
-    for (const store::Host& host : hosts) {
-        if (host.has_room && !host.draining && !host.recorder.empty()) {
-            shares[host.id];
-        }
-    }
-    for (const store::CameraLease& lease : store::CameraLeases(store).List()) {
-        const auto share = shares.find(lease.host_id);
-        if (!lease.enabled || share == shares.end()) {
-            continue;
-        }
-        ++share->second.cameras;
-        if (lease.fixed_host_id == 0) {
-            share->second.floating.push_back(lease.camera_id);
-        }
-    }
-    return shares;
 }
 
 }  // namespace
@@ -102,31 +76,18 @@ store::Host RemoveHost(store::Store& store, const Actor& actor, const std::strin
 }
 
 int BalanceHosts(store::Store& store, const Actor& actor) {
-    int moves = 0;
+    std::vector<store::CameraMove> moves;
     Apply(store, actor, [&] {
-        std::map<int, Share> shares = SharesOf(store, store::Hosts(store).All());
+        store::CameraLeases leases(store);
+        moves = store::MovesToBalance(store::Hosts(store).All(), leases.List());
         Json::Value moved;
-        while (shares.size() > 1) {
-            const auto least =
-                std::ranges::min_element(shares, {}, [](const auto& share) { return share.second.cameras; });
-            // A host whose cameras are all fixed gives none, however many it has.
-            const auto most = std::ranges::max_element(
-                shares, {}, [](const auto& share) { return share.second.floating.empty() ? 0 : share.second.cameras; });
-            if (most->second.floating.empty() || most->second.cameras <= least->second.cameras + 1) {
-                break;
-            }
-            const int camera = most->second.floating.back();
-            most->second.floating.pop_back();
-            --most->second.cameras;
-            least->second.floating.push_back(camera);
-            ++least->second.cameras;
-            store::CameraLeases(store).Move(camera, least->first);
-            moved[std::to_string(camera)] = least->first;
-            ++moves;
+        for (const auto& [camera, host] : moves) {
+            leases.Move(camera.camera_id, host);
+            moved[std::to_string(camera.camera_id)] = host;
         }
         return Change{"host.balance", "cameras", {}, moved};
     });
-    return moves;
+    return static_cast<int>(moves.size());
 }
 
 int HostNamed(store::Store& store, const std::string& name) {

@@ -46,9 +46,9 @@ std::int64_t FootageOf(store::Store& store, int host);
 // confirmed, while recordings lie on its mounts and there are other hosts.
 store::Host RemoveHost(store::Store& store, const Actor& actor, const std::string& name, bool confirmed);
 
-// Redistributes the floating cameras: has hosts give those that are too many to hosts that have too few. Fixed cameras
-// count towards what a host has; hosts that drain or have no mount to record to take no part. Returns how many are to
-// move.
+// Redistributes the floating cameras: has hosts that have much to do (store/host_loads.h) give some to those that have
+// little. Fixed cameras count towards what a host has; hosts that drain, are full or have no mount to record to take no
+// part. Returns how many are to move.
 int BalanceHosts(store::Store& store, const Actor& actor);
 
 // The id of the host of that name, 0 for kAnyHost. Throws store::NotFound.

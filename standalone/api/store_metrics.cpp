@@ -10,8 +10,7 @@
 #include "standalone/base/log.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/host_status.h"
-#include "standalone/store/camera_leases.h"
-#include "standalone/store/hosts.h"
+#include "standalone/store/host_loads.h"
 #include "standalone/store/replication.h"
 #include "standalone/store/settings.h"
 
@@ -42,6 +41,17 @@ void AddStates(MetricsText& text, const base::Installation& installation, store:
     for (const store::Host& host : hosts) {
         text.Sample(static_cast<double>(std::ranges::count(leases, host.id, &store::CameraLease::host_id)),
                     {{"host", host.name}});
+    }
+    const store::HostLoads loads(hosts, leases);
+    text.Family(
+        "lookhaven_host_bytes_per_second", "gauge",
+        "What the cameras of the host send; of those that were not measured yet, what the others do on average.");
+    for (const store::Host& host : hosts) {
+        text.Sample(static_cast<double>(loads.Of(host.id).bytes_per_second), {{"host", host.name}});
+    }
+    text.Family("lookhaven_host_processors", "gauge", "Processors of the host, by which its load is weighed.");
+    for (const store::Host& host : hosts) {
+        text.Sample(host.processors, {{"host", host.name}});
     }
     text.Family("lookhaven_cameras_without_host", "gauge", "Enabled cameras whose lease no host holds.");
     text.Sample(static_cast<double>(

@@ -11,16 +11,18 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/running.h"
 #include "standalone/cli/table.h"
+#include "standalone/cli/units.h"
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/host_status.h"
 #include "standalone/remote/certificate.h"
-#include "standalone/store/camera_leases.h"
+#include "standalone/store/host_loads.h"
 
 namespace lookhaven::cli {
 
 namespace {
 
 constexpr int kDefaultPort = 8443;
+constexpr const char* kUnknown = "unknown";
 
 struct Request {
     std::string name;
@@ -30,12 +32,24 @@ struct Request {
 };
 
 std::string StateText(const Json::Value& host) {
-    return host["state"].asString() + (host["draining"].asBool() ? ", drains" : "");
+    const std::string room = host["state"] == kUnknown ? "" : host["room"].asString();
+    return host["state"].asString() + (host["draining"].asBool() ? ", drains" : "") +
+           (room == "full"   ? ", full"
+            : room == "none" ? ", no mount"
+                             : "");
 }
 
-constexpr Column kColumns[] = {
-    {"id", "id"},           {"name", "name"},       {"address", "address"},  {"port", "port"},
-    {"version", "version"}, {"cameras", "cameras"}, {"state", "", StateText}};
+const char* NameOf(store::HostRoom room) {
+    return room == store::HostRoom::kFull ? "full" : room == store::HostRoom::kFree ? "free" : "none";
+}
+
+std::string LoadText(const Json::Value& host) {
+    return FormatSize(host["bytes_per_second"].asInt64()) + "/s";
+}
+
+constexpr Column kColumns[] = {{"id", "id"},           {"name", "name"},        {"address", "address"},
+                               {"port", "port"},       {"version", "version"},  {"cameras", "cameras"},
+                               {"load", "", LoadText}, {"state", "", StateText}};
 
 void Add(const Console& console, const Request& request) try {
     const base::Installation installation = console.Installation();
@@ -58,12 +72,17 @@ void List(const Console& console) {
     const auto states =
         is_watching ? maintenance::ReadHostStatus(installation) : std::vector<maintenance::HostStatus>();
     const auto leases = store::CameraLeases(store).List();
+    const auto hosts = store::Hosts(store).All();
+    const store::HostLoads loads(hosts, leases);
     Json::Value data = Json::arrayValue;
-    for (const store::Host& host : store::Hosts(store).All()) {
+    for (const store::Host& host : hosts) {
         const auto state = std::ranges::find(states, host.id, &maintenance::HostStatus::host);
         Json::Value& entry = data.append(admin::HostRecord(host));
         entry["cameras"] = static_cast<int>(std::ranges::count(leases, host.id, &store::CameraLease::host_id));
-        entry["state"] = state == states.end() ? "unknown" : maintenance::NameOf(state->state);
+        entry["bytes_per_second"] = Json::Int64(loads.Of(host.id).bytes_per_second);
+        entry["processors"] = host.processors;
+        entry["room"] = NameOf(host.room);
+        entry["state"] = state == states.end() ? kUnknown : maintenance::NameOf(state->state);
     }
     console.Answer(data, Table(kColumns, data));
 }

@@ -4,11 +4,12 @@
 #include <algorithm>
 #include <system_error>
 
+#include "standalone/base/amounts.h"
 #include "standalone/base/concat.h"
 #include "standalone/control/common_config.h"
 #include "standalone/doctor/checks.h"
 #include "standalone/maintenance/host_status.h"
-#include "standalone/store/hosts.h"
+#include "standalone/store/host_loads.h"
 #include "standalone/store/replication.h"
 
 namespace lookhaven::doctor {
@@ -27,6 +28,28 @@ void AddOffline(const base::Installation& installation, const std::vector<store:
                                 "start Lookhaven there; where it is gone for good, remove the host"});
         }
     }
+}
+
+// As after the return of a host that was offline.
+void AddUnequalLoads(const base::Installation& installation, std::vector<store::Host> hosts, store::Store& store,
+                     Findings& findings) {
+    const auto cameras = store::CameraLeases(store).List();
+    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(installation)) {
+        if (status.state == maintenance::HostState::kOffline) {
+            std::erase_if(hosts, [&status](const store::Host& host) { return host.id == status.host; });
+        }
+    }
+    const auto moves = store::MovesToBalance(hosts, cameras);
+    if (moves.size() < 2) {
+        return;
+    }
+    const auto most = std::ranges::find(hosts, moves.front().camera.host_id, &store::Host::id);
+    findings.push_back({base::Concat("host ", most->name, " has more to do than others: ",
+                                     base::FormatSize(store::HostLoads(hosts, cameras).Of(most->id).bytes_per_second),
+                                     " a second from its cameras"),
+                        base::Concat("run lookhaven host balance, which moves ", moves.size(),
+                                     " cameras; each is not recorded for some seconds then"),
+                        Severity::kNote});
 }
 
 void AddVersions(const std::vector<store::Host>& hosts, const store::Host& own, Findings& findings) {
@@ -58,6 +81,7 @@ Findings CheckHosts(const base::Installation& installation) {
         if (own != hosts.end()) {
             AddOffline(installation, hosts, findings);
             AddVersions(hosts, *own, findings);
+            AddUnequalLoads(installation, hosts, store, findings);
         } else if (!hosts.empty()) {
             findings.push_back({"this machine is not one of the hosts that share its store, so it records nothing",
                                 "stop the server, run lookhaven host add, and start the server"});

@@ -4,6 +4,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "standalone/store/host_loads.h"
+
 namespace lookhaven::recorder {
 
 namespace {
@@ -11,17 +13,23 @@ namespace {
 // A gap between two looks at the store longer than offline_us / kMaxGapPart restarts every host's timer.
 constexpr std::int64_t kMaxGapPart = 3;
 
+// Of those that take cameras: how large another one is does not matter.
+store::HostLoads LoadsOf(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+    std::vector<store::Host> taking;
+    for (const AssignedHost& host : hosts) {
+        if (host.takes) {
+            taking.push_back({.id = host.id, .processors = host.processors});
+        }
+    }
+    return {taking, cameras};
+}
+
 class Sharing {
   public:
-    Sharing(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras) {
+    Sharing(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras)
+        : loads_(LoadsOf(hosts, cameras)) {
         for (const AssignedHost& host : hosts) {
             hosts_.emplace(host.id, host);
-            cameras_[host.id] = 0;
-        }
-        for (const store::CameraLease& camera : cameras) {
-            if (camera.enabled && !IsFree(camera)) {
-                ++cameras_[camera.host_id];
-            }
         }
     }
 
@@ -58,20 +66,25 @@ class Sharing {
             taker = camera.next_host_id;
         } else {
             for (const auto& [id, host] : hosts_) {
-                if (host.takes && (taker == 0 || cameras_.at(id) < cameras_.at(taker))) {
+                if (host.takes && (taker == 0 || HasMoreRoom(host, hosts_.at(taker), camera))) {
                     taker = id;
                 }
             }
         }
         if (taker != 0) {
-            ++cameras_[taker];
+            loads_.Add(taker, loads_.BytesPerSecond(camera));
         }
         return taker;
     }
 
   private:
+    bool HasMoreRoom(const AssignedHost& one, const AssignedHost& other, const store::CameraLease& camera) const {
+        const std::int64_t more = loads_.BytesPerSecond(camera);
+        return one.is_full != other.is_full ? other.is_full : loads_.With(one.id, more) < loads_.With(other.id, more);
+    }
+
     std::map<int, AssignedHost> hosts_;
-    std::map<int, int> cameras_;  // by host
+    store::HostLoads loads_;
 };
 
 }  // namespace

@@ -53,6 +53,8 @@ struct AssignedHost {
     bool runs = false;       // as far as can be told; it may have been stopped a moment ago and start again
     bool takes = false;      // floating cameras: it runs, has a mount to record to, and does not drain
     bool gives = false;      // its floating cameras, where another host takes them
+    bool is_full = false;    // takes those alone that no other host takes
+    int processors = 0;      // as store::Host
 };
 
 struct Assignment {
@@ -60,7 +62,8 @@ struct Assignment {
     std::vector<int> give;                 // cameras whose lease is this host's
 };
 
-// own: this host's id, which is among the hosts. A floating camera goes to the host that has the fewest cameras.
+// own: this host's id, which is among the hosts. A floating camera goes to the host that has the least to do with it
+// (store/host_loads.h), of several to that with the lowest id.
 Assignment Assign(int own, const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras);
 
 }  // namespace lookhaven::recorder

@@ -2,7 +2,9 @@
 #include "standalone/recorder/camera_lease_keeper.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <string>
+#include <thread>
 #include <utility>
 
 #include "standalone/base/clock.h"
@@ -30,12 +32,17 @@ CameraLeaseKeeper::CameraLeaseKeeper(const base::Installation& installation, con
       thread_(installation.StoreUrl(), "share the cameras with the other hosts",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
-void CameraLeaseKeeper::Ask(bool has_room) {
-    has_room_ = has_room;
-    if (has_room) {
+void CameraLeaseKeeper::Ask(store::HostRoom room, const std::map<int, std::uint64_t>& received) {
+    const std::int64_t now_us = base::MonotonicMicros();
+    room_ = room;
+    if (room != store::HostRoom::kNone) {
         no_room_since_us_ = 0;
     } else if (no_room_since_us_ == 0) {
-        no_room_since_us_ = base::MonotonicMicros();
+        no_room_since_us_ = now_us;
+    }
+    {
+        const std::lock_guard lock(mutex_);
+        rates_.Note(received, now_us);
     }
     thread_.Ask();
 }
@@ -68,11 +75,16 @@ void CameraLeaseKeeper::Work(store::Store& store) {
     if (!rows_.FirstReservedId()) {
         return;
     }
-    hosts.SetVersion(own_, base::kVersion);
-    hosts.SetRoom(own_, has_room_);
+    hosts.Report({.id = own_,
+                  .version = base::kVersion,
+                  .room = room_,
+                  .processors = static_cast<int>(std::thread::hardware_concurrency())});
     store::CameraLeases leases(store);
     const std::vector<store::CameraLease> cameras = leases.List();
     NoteHolders(cameras);
+    if (const auto changed = ChangedRates(cameras); !changed.empty()) {
+        leases.SetRates(own_, changed);
+    }
     const Assignment assignment = Assign(own_, watched, cameras);
     std::set<int> held;
     for (const store::CameraLease& camera : cameras) {
@@ -105,15 +117,17 @@ std::vector<AssignedHost> CameraLeaseKeeper::Observe(const std::vector<store::Ho
     for (const store::Host& host : all) {
         const bool is_online = host.id == own_ || watch_.IsOnline(host.id);
         const bool runs = host.id == own_ || (is_online && !host.recorder.empty());
-        const bool has_room = host.id == own_ ? has_room_.load() : host.has_room;
+        const store::HostRoom room = host.id == own_ ? room_.load() : host.room;
         // Not at once: its mounts may not have been looked at yet, or be back in a moment.
         const std::int64_t since_us = no_room_since_us_;
         const bool lacks_room = host.id == own_ && since_us != 0 && base::MonotonicMicros() - since_us > offline_us_;
         hosts.push_back({.id = host.id,
                          .is_online = is_online,
                          .runs = runs,
-                         .takes = runs && has_room && !host.draining,
-                         .gives = host.draining || lacks_room});
+                         .takes = runs && room != store::HostRoom::kNone && !host.draining,
+                         .gives = host.draining || lacks_room,
+                         .is_full = room == store::HostRoom::kFull,
+                         .processors = host.processors});
     }
     return hosts;
 }
@@ -124,6 +138,20 @@ void CameraLeaseKeeper::Publish(std::set<int> held) {
         held_ = std::move(held);
         ++published_;
     }
+}
+
+// Those that differ by more than a quarter from what the store has: there is no need to change a row for less.
+std::map<int, std::int64_t> CameraLeaseKeeper::ChangedRates(const std::vector<store::CameraLease>& cameras) const {
+    std::map<int, std::int64_t> changed;
+    const std::lock_guard lock(mutex_);
+    for (const store::CameraLease& camera : cameras) {
+        const auto rate = rates_.BytesPerSecond().find(camera.camera_id);
+        if (camera.host_id == own_ && rate != rates_.BytesPerSecond().end() &&
+            std::abs(rate->second - camera.bytes_per_second) > camera.bytes_per_second / 4) {
+            changed.insert(*rate);
+        }
+    }
+    return changed;
 }
 
 void CameraLeaseKeeper::NoteHolders(const std::vector<store::CameraLease>& cameras) {

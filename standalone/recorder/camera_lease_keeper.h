@@ -15,6 +15,7 @@
 
 #include <atomic>
 #include <cstdint>
+#include <map>
 #include <mutex>
 #include <optional>
 #include <set>
@@ -23,6 +24,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/host_status.h"
 #include "standalone/recorder/assignment.h"
+#include "standalone/recorder/camera_rates.h"
 #include "standalone/recorder/event_row_queue.h"
 #include "standalone/recorder/store_thread.h"
 
@@ -34,8 +36,8 @@ class CameraLeaseKeeper {
     // object. Throws std::system_error when no thread can be started.
     CameraLeaseKeeper(const base::Installation& installation, const EventRowQueue& rows, std::int64_t offline_us);
 
-    // Call every second: does what is due; does not wait. has_room: there is a mount to record to.
-    void Ask(bool has_room);
+    // Call every second: does what is due; does not wait. received: as in CameraRates, of the cameras that are recorded.
+    void Ask(store::HostRoom room, const std::map<int, std::uint64_t>& received);
 
     // The cameras to record, until the next call. One thread.
     std::set<int> Held() const;
@@ -51,6 +53,7 @@ class CameraLeaseKeeper {
     void Work(store::Store& store);
     std::vector<AssignedHost> Observe(const std::vector<store::Host>& all);
     void Publish(std::set<int> held);
+    std::map<int, std::int64_t> ChangedRates(const std::vector<store::CameraLease>& cameras) const;
     void NoteHolders(const std::vector<store::CameraLease>& cameras);
     bool HasEnded(int camera) const;
     void Report(const std::vector<AssignedHost>& hosts, const std::vector<store::CameraLease>& cameras);
@@ -58,8 +61,8 @@ class CameraLeaseKeeper {
     const base::Installation& installation_;
     const EventRowQueue& rows_;
     const int own_;
-    std::atomic<bool> has_room_ = false;
-    std::atomic<std::int64_t> no_room_since_us_ = 0;  // 0: it has room, or was not asked yet
+    std::atomic<store::HostRoom> room_ = store::HostRoom::kNone;
+    std::atomic<std::int64_t> no_room_since_us_ = 0;  // 0: it has some mount, or was not asked yet
     const std::int64_t offline_us_;
 
     // Only the thread uses these.
@@ -67,6 +70,7 @@ class CameraLeaseKeeper {
     std::vector<maintenance::HostStatus> reported_;
 
     mutable std::mutex mutex_;
+    CameraRates rates_;
     std::set<int> held_;
     std::optional<std::set<int>> held_elsewhere_;
     std::int64_t published_ = 0;     // times that held_ changed

@@ -21,6 +21,7 @@ struct CameraSignal {
     std::string camera_name;
     bool is_recorded = false;
     StreamSignal stream;
+    std::uint64_t bytes = 0;  // received since the stream was started
 };
 
 class CameraStatusTracker {

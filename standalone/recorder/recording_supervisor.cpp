@@ -152,7 +152,13 @@ void RecordingSupervisor::AnswerFlushes() {
 void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
     if (camera_leases_) {
-        camera_leases_->Ask(HasRoom());
+        std::map<int, std::uint64_t> received;
+        for (const auto& [camera, signal] : signals) {
+            if (signal.is_recorded) {
+                received.emplace(camera, signal.bytes);
+            }
+        }
+        camera_leases_->Ask(Room(), received);
     }
     missed_marks_.Ask();
     std::map<int, maintenance::CameraStatus> recorded;
@@ -265,12 +271,22 @@ bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
     return camera_leases_ && camera_leases_->IsHeldElsewhere(camera);
 }
 
-bool RecordingSupervisor::HasRoom() const {
-    return std::ranges::any_of(mounts_, [](const auto& mount) {
-        const maintenance::MountState state = mount.second->Status().state;
-        return state != maintenance::MountState::kNotMounted && state != maintenance::MountState::kInUse &&
-               state != maintenance::MountState::kFailing;
+store::HostRoom RecordingSupervisor::Room() const {
+    using maintenance::MountState;
+    store::HostRoom room = store::HostRoom::kNone;
+    for (const auto& [id, mount] : mounts_) {
+        const MountState state = mount->Status().state;
+        if (state == MountState::kReady) {
+            room = store::HostRoom::kFree;
+        } else if (room == store::HostRoom::kNone &&
+                   (state == MountState::kSpaceHeld || state == MountState::kKeptFull)) {
+            room = store::HostRoom::kFull;
+        }
+    }
+    const bool is_disk_full = std::ranges::any_of(entries_, [](const auto& entry) {
+        return entry.second.worker->State().state == maintenance::RecordingState::kDiskFull;
     });
+    return room == store::HostRoom::kFree && is_disk_full ? store::HostRoom::kFull : room;
 }
 
 // A thread that cannot be started affects that camera or mount alone, and is tried again. Logged once for each

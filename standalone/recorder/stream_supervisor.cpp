@@ -127,7 +127,8 @@ void StreamSupervisor::Reconcile() {
 std::map<int, CameraSignal> StreamSupervisor::Signals() const {
     std::map<int, CameraSignal> signals;
     for (const auto& [stream, worker] : workers_) {
-        const CameraSignal signal{worker->Plan().camera_name, recordings_.QueueOf(stream) != nullptr, worker->Signal()};
+        const CameraSignal signal{worker->Plan().camera_name, recordings_.QueueOf(stream) != nullptr, worker->Signal(),
+                                  worker->Counts().bytes};
         const auto [known, is_first] = signals.try_emplace(stream.camera, signal);
         if (!is_first && !known->second.is_recorded && (signal.is_recorded || !signal.stream.reason.empty())) {
             known->second = signal;

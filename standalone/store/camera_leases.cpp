@@ -9,7 +9,7 @@ template <>
 struct Mapping<CameraLease> {
     static auto Members(auto& lease) {
         return std::tie(lease.camera_id, lease.enabled, lease.fixed_host_id, lease.host_id, lease.count,
-                        lease.next_host_id);
+                        lease.next_host_id, lease.bytes_per_second);
     }
 };
 
@@ -28,7 +28,8 @@ bool IsSilent(soci::session& sql, int host, std::int64_t heartbeat) {
 std::vector<CameraLease> CameraLeases::List() {
     return connection_.FetchAll<CameraLease>(
         "select cameras.id, cameras.enabled, cameras.host_id, coalesce(camera_leases.host_id, 0),"
-        " coalesce(camera_leases.count, 0), coalesce(camera_leases.next_host_id, 0)"
+        " coalesce(camera_leases.count, 0), coalesce(camera_leases.next_host_id, 0),"
+        " coalesce(camera_leases.bytes_per_second, 0)"
         " from cameras left join camera_leases on camera_id = id order by cameras.id");
 }
 
@@ -55,6 +56,19 @@ void CameraLeases::Release(int camera, int host) {
     connection_.Execute("update camera_leases set host_id = 0, count = count + 1"
                         " where camera_id = :camera and host_id = :host",
                         camera, host);
+}
+
+void CameraLeases::SetRates(int host, const std::map<int, std::int64_t>& bytes_per_second) {
+    connection_.Write(
+        [&](soci::session& sql) {
+            for (const auto& [camera, rate] : bytes_per_second) {
+                Execute(
+                    sql,
+                    "update camera_leases set bytes_per_second = :rate where camera_id = :camera and host_id = :host",
+                    rate, camera, host);
+            }
+        },
+        Durability::kLazy);
 }
 
 void CameraLeases::Move(int camera, int next_host) {

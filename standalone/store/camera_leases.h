@@ -10,6 +10,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <vector>
 
 #include "standalone/store/store.h"
@@ -20,10 +21,11 @@ namespace lookhaven::store {
 struct CameraLease {
     int camera_id = 0;
     bool enabled = true;
-    int fixed_host_id = 0;   // Camera::host_id
-    int host_id = 0;         // the holder; 0: nobody
-    std::int64_t count = 0;  // 0: nobody ever had it
-    int next_host_id = 0;    // to which an operator moved it; 0: it stays
+    int fixed_host_id = 0;              // Camera::host_id
+    int host_id = 0;                    // the holder; 0: nobody
+    std::int64_t count = 0;             // 0: nobody ever had it
+    int next_host_id = 0;               // to which an operator moved it; 0: it stays
+    std::int64_t bytes_per_second = 0;  // that it sends, as who records it measured last; 0: not yet
 
     friend bool operator==(const CameraLease&, const CameraLease&) = default;
 };
@@ -40,6 +42,8 @@ class CameraLeases {
     bool Take(const CameraLease& seen, int host, std::int64_t silent_heartbeat);
     // Gives up the host's lease; does nothing when it has none of that camera.
     void Release(int camera, int host);
+    // Stores how many bytes a second the host's cameras send, by camera; does nothing for those that it does not hold.
+    void SetRates(int host, const std::map<int, std::int64_t>& bytes_per_second);
     // Has the holder give the camera to that host, once it can take it. Does nothing for a camera that nobody ever
     // had.
     void Move(int camera, int next_host);

@@ -13,10 +13,10 @@ template <>
 struct Mapping<Host> {
     static constexpr const char* kTable = "hosts";
     static constexpr const char* kColumns =
-        "id, name, address, port, certificate, version, draining, has_room, heartbeat, holder";
+        "id, name, address, port, certificate, version, draining, has_room, processors, heartbeat, holder";
     static auto Members(auto& host) {
         return std::tie(host.id, host.name, host.address, host.port, host.certificate, host.version, host.draining,
-                        host.has_room, host.heartbeat, host.recorder);
+                        host.room, host.processors, host.heartbeat, host.recorder);
     }
 };
 
@@ -73,14 +73,10 @@ void Hosts::Update(const Host& host) {
     });
 }
 
-void Hosts::SetVersion(int id, const std::string& version) {
-    connection_.Execute("update hosts set version = :version where id = :id and version <> :known", version, id,
-                        version);
-}
-
-void Hosts::SetRoom(int id, bool has_room) {
-    connection_.Execute("update hosts set has_room = :room where id = :id and has_room <> :known", has_room, id,
-                        has_room);
+void Hosts::Report(const Host& host) {
+    connection_.Execute("update hosts set version = :version, has_room = :room, processors = :processors where id = :id"
+                        " and (version <> :old_version or has_room <> :old_room or processors <> :old_processors)",
+                        host.version, host.room, host.processors, host.id, host.version, host.room, host.processors);
 }
 
 void Hosts::Remove(int id) {

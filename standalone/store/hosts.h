@@ -15,6 +15,13 @@
 
 namespace lookhaven::store {
 
+// Whether a host can record more cameras, as its recorder says.
+enum class HostRoom {
+    kNone,  // it has no mount to record to
+    kFree,
+    kFull,  // its mounts have no space left that deleting recordings brings back
+};
+
 struct Host {
     int id = 0;                    // from 1, never used twice, since mounts carry it
     std::string name = {};         // UTF-8, 1 to 64 bytes, no other host's
@@ -23,7 +30,8 @@ struct Host {
     std::string certificate = {};  // … which shows this certificate, in PEM
     std::string version = {};      // of Lookhaven there
     bool draining = false;         // gives the cameras away that others may record, and takes none
-    bool has_room = false;         // has a mount to record to; as its recorder says
+    HostRoom room = HostRoom::kNone;
+    int processors = 0;  // as its recorder says; 0 before one has
     // The count of its recorder's lease (recorder_lease.h): changes while the recorder runs and reaches the store. A
     // host is offline once its heartbeat has not changed for a while of the watcher's own monotonic clock; the clocks of
     // two hosts are never compared.
@@ -39,14 +47,14 @@ class Hosts {
     // The store must outlive this object.
     explicit Hosts(Store& store) : connection_(store.connection()) {}
 
-    // Stores the record under a new id, which it returns; the first host gets the mounts that there are. has_room,
-    // heartbeat and recorder are ignored. Throws InvalidRecord or AlreadyExists.
+    // Stores the record under a new id, which it returns; the first host gets the mounts that there are. room,
+    // processors, heartbeat and recorder are ignored. Throws InvalidRecord or AlreadyExists.
     int Add(const Host& host);
     // Replaces name, address, port, certificate, version and draining of host.id. Throws as Add, and NotFound.
     void Update(const Host& host);
-    // Raise no revision. Nothing happens for an unknown host, or when that is stored already.
-    void SetVersion(int id, const std::string& version);
-    void SetRoom(int id, bool has_room);
+    // What a recorder says of host.id: version, room and processors. Raises no revision. Nothing happens for an unknown
+    // host, or when it is stored so.
+    void Report(const Host& host);
     // Removes the record, and gives up its leases; its mounts, with what lies on them, stay, and keep its id. Those of
     // the last host become a single machine's again. Throws NotFound; InvalidRecord while cameras are fixed to it.
     void Remove(int id);

@@ -247,6 +247,12 @@ constexpr const char* kAccessTokens[] = {
      " camera_id integer not null references cameras (id) on delete cascade, primary key (token_id, camera_id))"),
 };
 
+// What cameras send and what hosts have to record it with; 0 until that is measured.
+constexpr const char* kLoads[] = {
+    "alter table camera_leases add column bytes_per_second bigint not null default 0",
+    "alter table hosts add column processors integer not null default 0",
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -272,6 +278,7 @@ constexpr Migration kMigrations[] = {
      .on_postgresql = kMarkWordsByCameraOnPostgresql,
      .is_addition = true},
     {.purpose = "access tokens", .statements = kAccessTokens, .is_addition = true},
+    {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
 };
 
 }  // namespace

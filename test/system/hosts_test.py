@@ -151,6 +151,8 @@ class HostsTest(unittest.TestCase):
             cameras = int(self.sql("select count(*) from cameras"))
             self.assertIn(f'lookhaven_host_cameras{{host="North"}} {cameras}\n', text)
             self.assertIn('lookhaven_host_cameras{host="South"} 0\n', text)
+            enabled = int(self.sql("select count(*) from cameras where enabled = 1"))
+            self.assertIn(f'lookhaven_host_bytes_per_second{{host="North"}} {enabled * 500000}\n', text)
             self.assertIn("lookhaven_store_standby 0\n", text)
             self.assertIn("lookhaven_store_standbys 0\n", text)
 

@@ -45,7 +45,7 @@ class CliHostsTest : public CliTest {
     void RunRecorder(int host) {
         store::RecorderLease lease(store(), host);
         ASSERT_TRUE(lease.Take(lease.Current().count, "recorder", 7));
-        store::Hosts(store()).SetRoom(host, true);
+        store::Hosts(store()).Report({.id = host, .room = store::HostRoom::kFree, .processors = 2});
     }
     store::Store& store() {
         if (!store_) {
@@ -114,6 +114,8 @@ TEST_F(CliHostsTest, CamerasAreFixedDrainedAndBalanced) {
     Play({{"host balance", 0, std::to_string(floating / 2) + " cameras move"}});
     EXPECT_EQ(std::ranges::count(leases.List(), second, &store::CameraLease::next_host_id), floating / 2);
     EXPECT_EQ(leases.List().front().next_host_id, 0) << "it is fixed";
+    leases.SetRates(first, {{1, 5'000'000}, {leases.List().back().camera_id, 1'000'000}});
+    Play({{"host balance", 0, "4 cameras move"}, {"host list --json", 0, "\"bytes_per_second\" : "}});
 }
 
 TEST_F(CliHostsTest, AHostIsRemovedWithItsFootageOnlyWhenAnOwnerSaysSo) {

@@ -131,7 +131,7 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
 }
 
 void CliTest::UndoLastMigration() {
-    Sql({"drop table access_token_cameras", "drop table access_tokens", "delete from counters where name = 'token'",
+    Sql({"alter table camera_leases drop column bytes_per_second", "alter table hosts drop column processors",
          "update schema_version set version = version - 1"});
 }
 

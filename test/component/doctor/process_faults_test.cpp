@@ -171,9 +171,14 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
     };
     ExpectFoundAndMended(faults);
     Sql("update hosts set version = 'v' || id")();
+    add_host(3)();
+    Sql("update hosts set holder = 'a' where id > 1")();
+    Sql("insert into camera_leases (camera_id, host_id, count, next_host_id, bytes_per_second)"
+        " select id, 2, 1, 0, 10000 / id / id from cameras")();
     const cli::Outcome noted = Examine();
     EXPECT_EQ(noted.code, 0) << noted.text;
     EXPECT_THAT(noted.text, HasSubstr("host nvr2 runs version v2, this one v1"));
+    EXPECT_THAT(noted.text, HasSubstr("host nvr2 has more to do"));
 }
 
 TEST_F(DoctorTest, ASilentRecorderAndALeftSegmentAreFound) {

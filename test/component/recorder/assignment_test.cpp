@@ -1,17 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Which cameras a host takes and gives away, and which hosts it takes for offline.
+// Which cameras a host takes and gives away, what they send, and which hosts it takes for offline.
 #include "standalone/recorder/assignment.h"
 
-#include <string>
+#include <map>
+#include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "standalone/recorder/camera_rates.h"
+
 namespace lookhaven::recorder {
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr AssignedHost kTakes{0, true, true, true};
@@ -73,23 +75,68 @@ TEST(Assignment, ACameraMovesWhenItMustAndSomebodyTakesIt) {
     }
 }
 
-TEST(Assignment, FreeCamerasGoToTheHostsWithTheFewest) {
-    std::vector<store::CameraLease> cameras;
-    for (int id = 1; id <= 9; ++id) {
-        cameras.push_back({.camera_id = id, .host_id = id <= 2 ? 1 : 0});
-    }
-    const auto taken_by = [&cameras](int own, const std::vector<AssignedHost>& hosts) {
-        std::vector<int> taken;
-        for (const store::CameraLease& camera : Assign(own, hosts, cameras).take) {
-            taken.push_back(camera.camera_id);
-        }
-        return taken;
+constexpr AssignedHost Large(int processors, bool is_full = false) {
+    return {0, true, true, true, false, is_full, processors};
+}
+
+TEST(Assignment, EachFreeCameraIsTakenByTheOneHostWithTheLeastToDo) {
+    const struct {
+        const char* name;
+        std::vector<AssignedHost> hosts;
+        std::vector<std::pair<int, std::int64_t>> cameras;  // the holder, and what it sends; ids from 1
+        std::map<int, int> taken;                           // by which host
+    } rows[] = {
+        {"as many for each",
+         {kTakes, kTakes, kTakes, kDrains},
+         {{1, 0}, {1, 0}, {0, 0}, {0, 0}, {0, 0}, {0, 0}, {0, 0}, {4, 0}},
+         {{3, 2}, {4, 3}, {5, 2}, {6, 3}, {7, 1}}},
+        {"as many bytes for each",
+         {kTakes, kTakes},
+         {{1, 4000}, {2, 1000}, {0, 1000}, {0, 1000}, {0, 1000}, {0, 1000}},
+         {{3, 2}, {4, 2}, {5, 2}, {6, 1}}},
+        {"what was not measured counts as the others do",
+         {kTakes, kTakes},
+         {{1, 0}, {2, 100}, {2, 300}, {0, 0}, {0, 0}},
+         {{4, 1}, {5, 1}}},
+        {"as many for each processor", {Large(4), Large(2)}, {{0, 0}, {0, 0}, {0, 0}}, {{1, 1}, {2, 1}, {3, 2}}},
+        {"unless one of them never said how many it has", {Large(16), Large(0)}, {{1, 0}, {0, 0}}, {{2, 2}}},
+        {"a full one takes none", {Large(4, true), Large(1)}, {{2, 900}, {0, 900}}, {{2, 2}}},
+        {"where all are full they do", {Large(4, true), Large(4, true), kDrains}, {{1, 0}, {0, 0}}, {{2, 2}}},
     };
-    const auto hosts = Hosts({kTakes, kTakes, kTakes, kDrains});
-    EXPECT_THAT(taken_by(1, hosts), ElementsAre(7));
-    EXPECT_THAT(taken_by(2, hosts), ElementsAre(3, 5, 8));
-    EXPECT_THAT(taken_by(3, hosts), ElementsAre(4, 6, 9));
-    EXPECT_THAT(taken_by(4, hosts), IsEmpty());
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.name);
+        std::vector<store::CameraLease> cameras;
+        for (int id = 0; const auto& [holder, bytes] : row.cameras) {
+            cameras.push_back({.camera_id = ++id, .host_id = holder, .bytes_per_second = bytes});
+        }
+        const std::vector<AssignedHost> hosts = Hosts(row.hosts);
+        std::map<int, int> taken;
+        for (const AssignedHost& host : hosts) {
+            for (const store::CameraLease& camera : Assign(host.id, hosts, cameras).take) {
+                EXPECT_TRUE(taken.emplace(camera.camera_id, host.id).second) << "by two: " << camera.camera_id;
+            }
+        }
+        EXPECT_EQ(taken, row.taken);
+    }
+}
+
+TEST(CameraRates, AreThoseOfAWholeMinuteInWhichSomethingCame) {
+    CameraRates rates;
+    std::int64_t now_us = 0;
+    std::uint64_t bytes = 5'000'000;
+    const auto pass = [&](int seconds, std::uint64_t each) {
+        for (; seconds > 0; --seconds) {
+            rates.Note({{7, bytes += each}}, now_us += 1'000'000);
+        }
+        return rates.BytesPerSecond().contains(7) ? rates.BytesPerSecond().at(7) / 100 : -1;
+    };
+    EXPECT_EQ(pass(60, 900), -1);
+    EXPECT_EQ(pass(1, 900), 9);
+    EXPECT_EQ(pass(90, 0), 9) << "it is lost";
+    bytes = 0;
+    EXPECT_EQ(pass(61, 2000), 20) << "and back, with a count that begins anew";
+    rates.Note({}, 0);
+    EXPECT_THAT(rates.BytesPerSecond(), IsEmpty());
 }
 
 class HostWatchTest : public testing::Test {

@@ -77,8 +77,9 @@ void HostsTest::StartHosts(int count) {
     }
     ASSERT_TRUE(Eventually(kLimit, [&] {
         const auto hosts = store::Hosts(store_).All();
-        return std::ranges::all_of(hosts,
-                                   [](const store::Host& host) { return host.has_room && !host.recorder.empty(); });
+        return std::ranges::all_of(hosts, [](const store::Host& host) {
+            return host.room == store::HostRoom::kFree && !host.recorder.empty();
+        });
     }));
 }
 

@@ -75,12 +75,13 @@ TEST_P(HostTest, RecordsThatBreakARuleAreRefused) {
 TEST_P(HostTest, ARecordersCountSurvivesAChangeOfTheRecord) {
     Host host = Named("nvr1");
     host.id = hosts_.Add(host);
-    hosts_.SetRoom(host.id, true);
+    host.room = HostRoom::kFull;
+    host.processors = 4;
+    hosts_.Report(host);
     ASSERT_TRUE(RecorderLease(store_, host.id).Take(0, "/var on nvr1", 7));
     host.draining = true;
     host.port = 8443;
     hosts_.Update(host);
-    host.has_room = true;
     host.heartbeat = 1;
     host.recorder = "/var on nvr1";
     EXPECT_EQ(hosts_.Find(host.id), host);
@@ -147,7 +148,10 @@ TEST_P(HostTest, ALeaseOfACameraChangesHandsOnlyAsItWasSeen) {
     EXPECT_FALSE(leases.Take(With(free, &CameraLease::camera_id, 99), first, 0)) << "there is no such camera";
     EXPECT_TRUE(leases.Take(free, first, 0));
     EXPECT_FALSE(leases.Take(free, second, 0)) << "somebody was faster";
+    leases.SetRates(second, {{id, 300}});
+    leases.SetRates(first, {{id, 400}, {99, 1}});
     const CameraLease held = seen();
+    EXPECT_EQ(held.bytes_per_second, 400) << "who records it measures it";
     RecorderLease(store_, first).Take(0, "a", 1);
     EXPECT_FALSE(leases.Take(held, second, 0)) << "its host's heartbeat has changed";
     EXPECT_TRUE(leases.Take(held, second, 1)) << "it stands still";
@@ -156,7 +160,7 @@ TEST_P(HostTest, ALeaseOfACameraChangesHandsOnlyAsItWasSeen) {
     EXPECT_EQ(hosts_.HostOfCamera(id), second) << "what it has lost it cannot give up";
     leases.Move(id, first);
     leases.Release(id, second);
-    EXPECT_EQ(seen(), (CameraLease{.camera_id = id, .count = 3, .next_host_id = first}));
+    EXPECT_EQ(seen(), (CameraLease{.camera_id = id, .count = 3, .next_host_id = first, .bytes_per_second = 400}));
     EXPECT_TRUE(leases.Take(seen(), first, 0));
     EXPECT_EQ(seen().next_host_id, 0) << "it was moved once";
     const CameraLease last = seen();
