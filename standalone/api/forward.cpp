@@ -11,6 +11,7 @@
 
 #include "standalone/api/admit.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/concat.h"
 #include "standalone/base/log.h"
 #include "standalone/binding/compact_json.h"
 #include "standalone/binding/send_queue.h"
@@ -83,6 +84,7 @@ class AnswerForwarder : public remote::AnswerSink {
 
     bool Begin(const remote::AnswerHead& head) override {
         status_ = head.status;
+        is_from_host_ = head.is_from_host;
         if (IsWithheld()) {
             return false;
         }
@@ -122,8 +124,8 @@ class AnswerForwarder : public remote::AnswerSink {
         return !call_.slot.MustEnd() && (::poll(&viewer, 1, 0) <= 0 || (viewer.revents & (POLLRDHUP | POLLHUP)) == 0);
     }
 
-    // Whether the other web server answered for a host that is offline, or that host did itself.
-    bool IsBadGateway() const { return status_ == kBadGateway; }
+    // Whether the other web server answered for a host that is offline.
+    bool IsBadGateway() const { return status_ == kBadGateway && !is_from_host_; }
     bool IsWithheld() const {
         const bool is_of_player = status_ < 400 || status_ == 400 || status_ == 409;
         return IsBadGateway() || (kind_ == Forwarded::kControl && status_ == 404) ||
@@ -154,6 +156,7 @@ class AnswerForwarder : public remote::AnswerSink {
     const Forwarded kind_;
     std::chrono::steady_clock::time_point next_look_;
     int status_ = 0;
+    bool is_from_host_ = false;
 };
 
 Failure Offline(const store::Host& host, const std::string& what, const std::string& why) {
@@ -178,6 +181,10 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
     }
     request.headers["REMOTE_ADDR"] = *client;
     return true;
+}
+
+std::string LinesForForwarder(const http::Request& request) {
+    return request.headers.contains(kTokenHeader) ? base::Concat(remote::kHostAnswers, ": yes\r\n") : "";
 }
 
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what) {

@@ -188,9 +188,9 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
 
 std::string ServeOrFail(const Service& service, http::Request& request, control::SlotTable& slots,
                         control::Slot& slot) {
-    const auto fail = [&slot](const Failure& failure) {
+    const auto fail = [&](const Failure& failure) {
         slot.status = failure.Status();
-        return http::FailureAnswer(failure);
+        return http::FailureAnswer(failure, LinesForForwarder(request));
     };
     try {
         slot.status = 200;

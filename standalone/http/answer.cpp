@@ -51,12 +51,12 @@ std::string JsonAnswer(int status, const std::string& body, const std::string& e
     return JsonHead(status, body.size(), extra) + body;
 }
 
-std::string FailureAnswer(const Failure& failure) {
+std::string FailureAnswer(const Failure& failure, const std::string& extra) {
     const int retry_after_s = failure.RetryAfterSeconds();
     return JsonAnswer(failure.Status(),
                       R"({"error":{"code":)" + std::to_string(failure.Status()) + R"(,"data":)" + failure.Data() +
                           R"(,"message":)" + Json::valueToQuotedString(failure.what()) + R"(},"success":false})",
-                      retry_after_s > 0 ? "Retry-After: " + std::to_string(retry_after_s) + "\r\n" : "");
+                      (retry_after_s > 0 ? "Retry-After: " + std::to_string(retry_after_s) + "\r\n" : "") + extra);
 }
 
 }  // namespace lookhaven::http

@@ -40,7 +40,7 @@ std::string JsonHead(int status, std::size_t body_bytes, const std::string& extr
 // The whole answer. extra: further header lines, each ending in CR LF.
 std::string JsonAnswer(int status, const std::string& body, const std::string& extra = "");
 
-// {"success": false, "error": {"code": status, "data": data, "message": …}}
-std::string FailureAnswer(const Failure& failure);
+// {"success": false, "error": {"code": status, "data": data, "message": …}}; extra as above.
+std::string FailureAnswer(const Failure& failure, const std::string& extra = "");
 
 }  // namespace lookhaven::http

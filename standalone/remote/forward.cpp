@@ -107,6 +107,7 @@ class ForwardedTransfer {
         AnswerHead head;
         head.status = static_cast<int>(status);
         head.size_bytes = handle_.SizeBytes();
+        head.is_from_host = !handle_.Header(kHostAnswers).empty();
         if (const std::string type = handle_.ContentType(); IsPlain(type)) {
             head.content_type = type;
         }

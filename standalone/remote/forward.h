@@ -27,12 +27,16 @@ struct ForwardedRequest {
     int receive_bytes = 0;                   // of the connection's buffer; 0: the system's default
 };
 
+// The header of a failure that the host answers itself: without it one may be that of its web server.
+constexpr const char* kHostAnswers = "X-Lookhaven-Host-Answers";
+
 struct AnswerHead {
     int status = 0;
     std::string content_type;  // empty: none
     std::vector<std::pair<std::string, std::string>> headers;
     std::string location;          // the path of a redirect on that host; empty: none
     std::int64_t size_bytes = -1;  // of the body; -1: not known
+    bool is_from_host = false;     // it has kHostAnswers
 };
 
 // Takes an answer as it arrives. A function that returns false ends it.

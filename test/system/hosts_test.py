@@ -67,6 +67,9 @@ class HostsTest(unittest.TestCase):
 
     def test_live_pictures_come_through(self):
         wait_until(lambda: self.other.request(call(LIVE, "Play", camera=1, snapshot=1), "viewer").status == 200, 15, "a snapshot")
+        passed, direct = (server.request(call(LIVE, "Play", camera=2, snapshot=1), "admin") for server in (self.other, self.owner))
+        self.assertEqual((passed.status, passed.body), (direct.status, direct.body), "it is no JPEG camera's")
+        self.assertEqual(direct.status, 502)
         with self.other.live(1, "viewer") as parts:
             heads = [parts.next()[0] for _ in range(10)]
         self.assertLess(float(heads[-1]["x-age-ms"]), 1000)
