@@ -2,9 +2,10 @@
 # SPDX-License-Identifier: Apache-2.0
 #
 # Each command has a manual page, which groff sets without a complaint and which has each word of its --help:
-# manual_test.sh <lookhaven>
+# manual_test.sh <lookhaven> <program-page> <program of a service>...
 set -uo pipefail
-program=$1
+program=$1 program_page=$2
+shift 2
 pages=$(mktemp -d)
 trap 'rm -rf "$pages"' EXIT
 failed=0
@@ -17,6 +18,13 @@ Miss() {
 # The commands that a --help lists.
 CommandsOf() {
     "$program" "$@" --help | sed -n '/^Subcommands:/,$s/^  \([a-z-]*\) .*/\1/p'
+}
+
+# Set <page>: with groff, from <page>.1.
+Set() {
+    local complaints
+    complaints=$(groff -man -ww -K utf8 -T utf8 -P -cbou "$1.1" 2>&1 >"$1") || Miss "$1: groff fails"
+    [[ ! $complaints ]] || Miss "$1: $complaints"
 }
 
 # Check <page> <command>...: what the command takes, and those below it.
@@ -37,10 +45,15 @@ Check() {
 count=0
 for command in $(CommandsOf); do
     page=$pages/lookhaven-$command
-    complaints=$(groff -man -ww -K utf8 -T utf8 -P -cbou "$page.1" 2>&1 >"$page") || Miss "$command: groff fails"
-    [[ ! $complaints ]] || Miss "$command: $complaints"
+    Set "$page"
     Check "$page" "$command"
     count=$((count + 1))
 done
 ((count > 20)) || Miss "only $count commands are listed"
+for program; do
+    page=$pages/$(basename "$program")
+    "$program_page" "${page##*/}" 1.2.3 "$program" >"$page.1" || Miss "$program: no page is written"
+    Set "$page"
+    Check "$page"
+done
 exit "$failed"
