@@ -7,6 +7,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <stdexcept>
 #include <string_view>
 #include <system_error>
@@ -21,6 +22,7 @@
 #include "standalone/base/file.h"
 #include "standalone/emap/pictures.h"
 #include "standalone/store/copy.h"
+#include "standalone/store/emap_pictures.h"
 
 namespace lookhaven::backup {
 
@@ -126,6 +128,18 @@ void CopyKeys(const base::Installation& installation, const WorkFolder& folder) 
     }
 }
 
+// Those that maps of the records have and this host has not as files, which another host of the store has written.
+void FetchPictures(store::Store& store, store::Store& records, const fs::path& own, const fs::path& folder) {
+    fs::create_directory(folder);
+    for (const store::Emap& emap : store::Emaps(records).List()) {
+        if (emap::IsPictureName(emap.image) && !fs::exists(own / emap.image)) {
+            if (const auto bytes = store::EmapPictures(store).Find(emap.image)) {
+                base::WriteFileAtomically(folder / emap.image, *bytes);
+            }
+        }
+    }
+}
+
 class BackupWriter {
   public:
     explicit BackupWriter(int descriptor) : tar_(descriptor) {}
@@ -138,13 +152,17 @@ class BackupWriter {
         file["sha256"] = digest.sha256;
     }
 
-    // Returns how many there are.
+    // Returns how many files were added: those whose name another one has had are left out.
     int AddFolder(const std::string& folder, const fs::path& path) {
-        const std::vector<fs::path> files = FilesOf(folder, path);
-        for (const fs::path& file : files) {
-            Add(folder + "/" + file.filename().string(), file);
+        int added = 0;
+        for (const fs::path& file : FilesOf(folder, path)) {
+            const std::string name = folder + "/" + file.filename().string();
+            if (names_.insert(name).second) {
+                Add(name, file);
+                ++added;
+            }
         }
-        return static_cast<int>(files.size());
+        return added;
     }
 
     void Finish(const Summary& summary) {
@@ -160,6 +178,7 @@ class BackupWriter {
   private:
     TarWriter tar_;
     Json::Value files_ = Json::arrayValue;
+    std::set<std::string> names_;
 };
 
 // Throws Malformed unless the manifest names those files with those contents, and no others.
@@ -235,12 +254,14 @@ Summary Write(const base::Installation& installation, store::Store& store, int d
     store::Store::Migrate(SqliteUrl(records));
     {
         store::Store copy = store::Store::Open(SqliteUrl(records));
-        summary.records = CopyRecords(store, copy, store::CopySessions::kNo);
+        summary.records = CopyRecords(store, copy, store::CopySessions::kNo, store::CopyPictures::kNo);
+        FetchPictures(store, copy, installation.Home() / kPictures, folder / kPictures);
         store::CheckpointWal(copy);
     }
     BackupWriter writer(descriptor);
     writer.Add(kRecords, records);
-    summary.pictures = writer.AddFolder(kPictures, installation.Home() / kPictures);
+    summary.pictures = writer.AddFolder(kPictures, folder / kPictures);
+    summary.pictures += writer.AddFolder(kPictures, installation.Home() / kPictures);
     if (certificate == Certificate::kIncluded) {
         CopyKeys(installation, folder);
         summary.has_certificate = writer.AddFolder(kCertificate, folder / kCertificate) > 0;

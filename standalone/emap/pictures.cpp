@@ -24,6 +24,7 @@ using namespace std::string_view_literals;
 
 constexpr auto kMinUnusedAge = std::chrono::minutes(1);
 constexpr std::int64_t kMinUnusedSecondsInStore = 600;
+constexpr std::uintmax_t kMinFreeBytes = 16 * kMaxPictureBytes;
 
 // Removes spaces, comments and processing instructions; false when one does not end.
 bool SkipProlog(std::string_view& text) {
@@ -129,8 +130,7 @@ std::set<std::string> Pictures::Used() {
     return used;
 }
 
-void Pictures::Sweep() {
-    const std::set<std::string> used = Used();
+void Pictures::SweepFiles(const std::set<std::string>& used) {
     std::error_code error;
     for (const fs::directory_entry& file : fs::directory_iterator(folder_, error)) {
         const fs::file_time_type written = file.last_write_time(error);
@@ -140,6 +140,10 @@ void Pictures::Sweep() {
             fs::remove(file.path(), error);
         }
     }
+}
+
+void Pictures::Sweep() {
+    SweepFiles(Used());
     store::EmapPictures(store_).RemoveUnused(base::WallSeconds() - kMinUnusedSecondsInStore);
 }
 
@@ -165,7 +169,19 @@ void Pictures::Share() {
     }
 }
 
-std::string Pictures::Read(const std::string& name) const {
+// Without it each view would fetch megabytes from the store.
+void Pictures::Keep(const std::string& name, std::string_view bytes) noexcept try {
+    const std::set<std::string> used = Used();
+    SweepFiles(used);
+    fs::create_directories(folder_);
+    if (used.contains(name) && fs::space(folder_).available > kMinFreeBytes) {
+        base::WriteFileAtomically(folder_ / name, bytes);
+    }
+} catch (const std::exception& error) {
+    base::LogWarning(std::string("cannot keep a picture of an e-map: ") + error.what());
+}
+
+std::string Pictures::Read(const std::string& name) {
     if (!IsPictureName(name)) {
         throw std::system_error(ENOENT, std::generic_category(), "\"" + name + "\" is not a picture of an e-map");
     }
@@ -176,6 +192,7 @@ std::string Pictures::Read(const std::string& name) const {
         if (!shared || shared->size() > kMaxPictureBytes || PictureType(*shared) != name.substr(name.find('.') + 1)) {
             throw;
         }
+        Keep(name, *shared);
         return *std::move(shared);
     }
 }

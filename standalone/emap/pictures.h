@@ -50,12 +50,15 @@ class Pictures {
     // before this host was one of them. What fails is logged, and tried again when it is called next.
     void Share();
 
-    // The file's bytes, or the store's. Throws std::system_error when neither is there, also for a name that is not
-    // one of ours.
-    std::string Read(const std::string& name) const;
+    // The file's bytes, or the store's, which are a file here from then on where a map has the picture and the disk has
+    // room; what no map has any more is removed then, as Sweep does. Throws std::system_error when neither is there,
+    // also for a name that is not one of ours.
+    std::string Read(const std::string& name);
 
   private:
     std::string ReadFile(const std::string& name) const;
+    void Keep(const std::string& name, std::string_view bytes) noexcept;
+    void SweepFiles(const std::set<std::string>& used);
     std::set<std::string> Used();
 
     store::Store& store_;

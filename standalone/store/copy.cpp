@@ -23,6 +23,8 @@ namespace {
 constexpr std::array<std::string_view, 4> kNotCopied = {"schema_version", "recorder_lease", "camera_leases",
                                                         "login_attempts"};
 
+constexpr std::string_view kPictures = "emap_pictures";
+
 // PostgreSQL's client takes in all rows of an answer.
 constexpr const char* kOpenCursor = "declare copied no scroll cursor for select * from ";
 constexpr const char* kFetchFromCursor = "fetch 1000 from copied";
@@ -30,7 +32,7 @@ constexpr const char* kFetchLargeFromCursor = "fetch 1 from copied";  // a row o
 constexpr const char* kCloseCursor = "close copied";
 
 // In the order in which they were created, so that what refers to a row comes after it.
-std::vector<std::string> CopiedTables(CopySessions sessions) {
+std::vector<std::string> CopiedTables(CopySessions sessions, CopyPictures pictures) {
     constexpr std::string_view kCreate = "create table ";
     std::vector<std::string> tables;
     for (const Migration& migration : Migrations()) {
@@ -41,7 +43,8 @@ std::vector<std::string> CopiedTables(CopySessions sessions) {
             const std::string_view rest = statement.substr(kCreate.size());
             const std::string_view name = rest.substr(0, rest.find(' '));
             if (std::ranges::find(kNotCopied, name) == kNotCopied.end() &&
-                (name != "sessions" || sessions == CopySessions::kYes)) {
+                (name != "sessions" || sessions == CopySessions::kYes) &&
+                (name != kPictures || pictures == CopyPictures::kYes)) {
                 tables.emplace_back(name);
             }
         }
@@ -157,7 +160,7 @@ std::int64_t CopyTable(Connection& source, soci::session& from, soci::session& t
     from << kOpenCursor + table;
     std::int64_t all = 0;
     std::int64_t rows = 0;
-    const char* const fetch = table == "emap_pictures" ? kFetchLargeFromCursor : kFetchFromCursor;
+    const char* const fetch = table == kPictures ? kFetchLargeFromCursor : kFetchFromCursor;
     do {
         rows = Visit(from, fetch, insert);
         all += rows;
@@ -213,8 +216,8 @@ void CheckpointWal(Store& store) {
     }
 }
 
-std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions) {
-    const std::vector<std::string> tables = CopiedTables(sessions);
+std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions, CopyPictures pictures) {
+    const std::vector<std::string> tables = CopiedTables(sessions, pictures);
     return source.connection().ReadAtOneMoment([&](soci::session& from) {
         RequireKnown(from);
         LiftTimeLimit(source.connection(), from);

@@ -11,6 +11,7 @@
 namespace lookhaven::store {
 
 enum class CopySessions { kNo, kYes };
+enum class CopyPictures { kNo, kYes };  // of e-maps, those that the store has
 
 // Throws InvalidRecord for a store with accounts, cameras or recordings of its own.
 void RequireUnused(Store& store);
@@ -23,7 +24,8 @@ void RequireTablesOnly(const std::string& url);
 // was just set up: throws as RequireUnused, since its records would be lost; SchemaError for a source that a newer
 // program has added to. Returns the number of rows. Leases of
 // recorders and of cameras are not copied, nor are failed log-ins.
-std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions);
+std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions,
+                         CopyPictures pictures = CopyPictures::kYes);
 
 // Has all of a SQLite store in its one file, which may be copied once the store is closed. Throws StoreError.
 void CheckpointWal(Store& store);

@@ -12,6 +12,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/emap/pictures.h"
+#include "standalone/store/emap_pictures.h"
 #include "standalone/store/users.h"
 #include "test/support/folder.h"
 
@@ -48,12 +49,15 @@ class BackupTest : public testing::Test {
 
 TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     std::string image;
+    const std::string of_other_host = "1-0123456789abcdef.svg";
     {
         store::Store store = store::Store::Open(old_.StoreUrl());
         store::Users(store).Add("bob", "correct horse", store::Privilege::kOwner);
         const int map = store::Emaps(store).Add({.name = "Ground floor"});
         image = emap::Pictures(store, old_.Home()).Write("<svg/>");
         store::Emaps(store).SetImage(map, image);
+        store::EmapPictures(store).Put(of_other_host, "<svg>2</svg>", 0);
+        store::Emaps(store).SetImage(store::Emaps(store).Add({.name = "Yard"}), of_other_host);
     }
     base::WriteFileAtomically(old_.TlsFolder() / "key.pem", "secret");
     fs::create_directory(old_.SigningKeyFile().parent_path());
@@ -67,7 +71,7 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     EXPECT_FALSE(fs::exists(old_.RunFolder() / "backup"));
     const Summary restored = Restore("backup");
     EXPECT_EQ(restored.version, "1.2.3");
-    EXPECT_EQ(restored.pictures, 1);
+    EXPECT_EQ(restored.pictures, 2);
     EXPECT_EQ(base::ReadFile(new_.TlsFolder() / "key.pem"), "secret");
     EXPECT_EQ(base::ReadFile(new_.SigningKeyFile()), "signs exports");
     EXPECT_EQ(fs::status(new_.SigningKeyFile().parent_path()).permissions(), fs::perms::owner_all);
@@ -77,6 +81,8 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     store::Store store = store::Store::Open(new_.StoreUrl());
     EXPECT_TRUE(store::Users(store).CheckPassword("bob", "correct horse"));
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(image), "<svg/>");
+    EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(of_other_host), "<svg>2</svg>");
+    EXPECT_FALSE(store::EmapPictures(store).Find(of_other_host)) << "once is enough";
     EXPECT_THROW(Restore("backup"), store::InvalidRecord) << "the account would be lost";
 }
 

@@ -103,6 +103,8 @@ TEST_P(PicturesTest, HostsOfOneStoreHaveEachOthersPictures) {
     EXPECT_EQ(can_read(first, png), is_shared) << "a map uses it";
 
     Force("delete from emap_pictures");  // as on a host that was alone until now
+    EXPECT_EQ(can_read(first, png), is_shared) << "it was kept";
+    std::filesystem::remove_all(other_folder / "emaps");
     other.Share();
     EXPECT_FALSE(can_read(first, png)) << "its host has not shared it";
     pictures_.Share();
@@ -114,10 +116,15 @@ TEST_P(PicturesTest, HostsOfOneStoreHaveEachOthersPictures) {
     Put(map, "\xff\xd8\xff\xe0");
     EXPECT_EQ(can_read(first, png), is_shared) << "a client that has just read its name may still load it";
     Force("update emap_pictures set touched_s = touched_s - 3600");
-    other.Sweep();
-    EXPECT_FALSE(can_read(first, png)) << "no map uses it any more";
+    const auto kept = other_folder / "emaps" / first;
+    std::error_code ignored;
+    std::filesystem::last_write_time(kept, std::filesystem::file_time_type::clock::now() - std::chrono::hours(1),
+                                     ignored);
     const std::string second = emaps_.Find(map)->image;
     EXPECT_EQ(can_read(second, "\xff\xd8\xff\xe0"), is_shared);
+    EXPECT_FALSE(std::filesystem::exists(kept)) << "no map uses it any more";
+    other.Sweep();
+    EXPECT_FALSE(can_read(first, png));
 
     const std::string unused = pictures_.Write(png);
     pictures_.Withdraw(unused);
