@@ -10,10 +10,13 @@
 #include <system_error>
 #include <vector>
 
+#include <unistd.h>
+
 #include "standalone/api/health.h"
 #include "standalone/api/metrics_text.h"
 #include "standalone/api/store_metrics.h"
 #include "standalone/base/clock.h"
+#include "standalone/base/process.h"
 #include "standalone/control/common_config.h"
 #include "standalone/control/stream_counters.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -40,6 +43,21 @@ void AddStreams(MetricsText& text, const Streams& streams, const char* name, con
     }
 }
 
+// Those that run for long: request processes are started and ended all the time.
+void AddUptimes(MetricsText& text, const base::Installation& installation) {
+    text.Family("lookhaven_process_uptime_seconds", "gauge", "For how long the process has run.");
+    const pid_t host = ::getppid();  // of this request's process
+    const auto add = [&](const char* name, const base::ProcessIdentity& process) {
+        if (const std::int64_t started_s = base::StartedAt(process); started_s != 0) {
+            text.Sample(static_cast<double>(base::WallSeconds() - started_s), {{"process", name}});
+        }
+    };
+    if (const auto recorder = control::RecorderProcess(installation)) {
+        add("recorder", *recorder);
+    }
+    add("webapi", {host, base::ProcessStartTicks(host)});
+}
+
 void AddRecorder(MetricsText& text, const base::Installation& installation) {
     const bool is_alive = control::FindRecorder(installation) == control::RecorderState::kAlive;
     text.Family("lookhaven_recorder_up", "gauge", "Whether the recorder runs and does not hang.");
@@ -52,6 +70,14 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
                    const double age_us = now_us - static_cast<double>(each.last_picture_us);
                    return each.pictures > 0 && age_us <= kMaxPictureAgeUs ? 1 : 0;
                });
+    text.Family("lookhaven_stream_picture_age_seconds", "gauge", "How long ago the newest picture came.");
+    for (const Counters& each : streams) {
+        if (each.pictures > 0) {
+            text.Sample(
+                (now_us - static_cast<double>(each.last_picture_us)) / 1e6,
+                {{"camera", std::to_string(each.stream.camera)}, {"stream", std::to_string(each.stream.stream)}});
+        }
+    }
     AddStreams(text, streams, "lookhaven_stream_pictures_total", "counter", "Pictures that came from the camera.",
                false, [](const Counters& each) { return static_cast<double>(each.pictures); });
     AddStreams(text, streams, "lookhaven_stream_bytes_total", "counter", "Bytes of pictures and sound that came.",
@@ -224,6 +250,7 @@ std::string MetricsOf(const Call& call, store::Store* records) {
     MetricsText text;
     const base::Installation& installation = call.context.Installation();
     AddRecorder(text, installation);
+    AddUptimes(text, installation);
     AddStore(text, records);
     try {
         if (records != nullptr) {

@@ -10,6 +10,7 @@ import shutil
 import signal
 import socket
 import subprocess
+import time
 import unittest
 
 from installation import ROOT, Installation, call, wait_until
@@ -105,6 +106,11 @@ class MonitoringTest(unittest.TestCase):
         for name in ("recorder", "store"):
             self.assertEqual(now[f"lookhaven_{name}_up", ""], 1)
         self.assertLess(now["lookhaven_recording_lag_seconds", stream_1], 5)
+        self.assertLess(now["lookhaven_stream_picture_age_seconds", stream_1], 10)
+        for process in ("recorder", "webapi"):
+            ticks = int(pathlib.Path(f"/proc/{self.server.part(process)}/stat").read_text().rsplit(")")[1].split()[19])
+            uptime = time.clock_gettime(time.CLOCK_BOOTTIME) - ticks / os.sysconf("SC_CLK_TCK")
+            self.assertAlmostEqual(now["lookhaven_process_uptime_seconds", f'process="{process}"'], uptime, delta=10)
         self.assertLess(now["lookhaven_recording_store_lag_seconds", ""], 10)
 
     def test_is_well_formed_for_prometheus(self):
