@@ -215,12 +215,13 @@ class PairingTest(unittest.TestCase):
         server = pair(code.lower().replace("-", " "), address="127.0.0.1")
         self.addCleanup(self.watcher.cli, "server", "remove", str(server["id"]), "--yes")
         self.assertEqual({camera["idOnServer"] for camera in server["camera"]}, set(self.known()))
-        self.assertEqual(pair(code), "code", "it was used")
+        self.assertEqual(pair(code)["id"], server["id"], "it asks again")
         self.assertEqual(ask(self.watcher, "Check", id=server["id"]).json["data"], {"answers": True, "reason": ""})
         wait_until(lambda: self.relay(1, server=server["id"]).status == 200, 15, "a picture of the new pairing")
         said = json.loads(self.watcher.cli("server", "add", "By code", "--address", "localhost", "--port", str(self.owner.tls_port),
                                            "--json", text=self.owner.cli("server", "invite", "By code")))
         self.assertEqual((said["id"], said["answers"]), (server["id"], True), "renewed, by the command line")
+        self.assertEqual(pair(code), "code", "the pairing of the code is over")
         watchers = [one for one in ask(self.owner, "List").json["data"]["server"] if one["name"] == "By code"]
         self.assertEqual(len(watchers), 1)
         self.assertIn("removed", ask(self.owner, "Remove", id=watchers[0]["id"], revision=watchers[0]["revision"]).json["data"])
