@@ -151,6 +151,7 @@ Json::Value ToJson(const CameraSetup& setup) {
     json["account"] = setup.credentials ? setup.credentials->account : "";
     json["hasPassword"] = !PasswordOf(setup).empty();
     json["plan"] = PlanJson(setup.plan);
+    json["limitDays"] = DaysJson(camera.max_age_s);
     if (camera.host_id != 0) {
         json["host"] = camera.host_id;
     }
@@ -186,7 +187,7 @@ CameraSetup AddCamera(store::Store& store, const Actor& actor, const media::Sour
 }
 
 CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, int id,
-                      std::optional<std::int64_t> seen, const CameraEdit& edit) {
+                      std::optional<std::int64_t> seen, const CameraEdit& edit, bool confirmed) {
     RequireManager(store, actor);
     const CameraSetup before = ReadCamera(store, id);
     const Json::Value before_json = ToJson(before);
@@ -194,6 +195,11 @@ CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::Sour
     CameraSetup setup = before;
     edit(setup);
     RequireNewSources(kinds, setup.camera, before.camera);
+    if (!confirmed && IsLower(setup.camera.max_age_s, before.camera.max_age_s)) {
+        RequireNoLoss(before.camera, setup.camera, [&store, now_s = base::WallSeconds()](const Camera& camera) {
+            return maintenance::ForecastRetention(store, camera.id, camera.max_age_s, now_s);
+        });
+    }
     Apply(store, actor, [&] {
         RequireCurrent(ToJson(ReadCamera(store, id)), before_json["revision"].asInt64());
         const bool has_new_credentials =

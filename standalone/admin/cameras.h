@@ -13,6 +13,7 @@
 #include <json/json.h>
 
 #include "standalone/admin/actor.h"
+#include "standalone/admin/retention_limits.h"
 #include "standalone/media/source.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/recording_plans.h"
@@ -46,11 +47,12 @@ Json::Value ToJson(const CameraSetup& setup);
 // InvalidRecord (for more than 1,000 cameras, too), NotFound, and Stale, whose record is that of ToJson, for another
 // revision than the one seen and for a change made by somebody else while the edit ran.
 //
+// confirmed: also where a lower maximum age deletes recordings, for which it throws DeletesRecordings otherwise.
 // prepare: may look at the stream, which takes seconds, and fill in what it finds. Called before anything is stored.
 CameraSetup AddCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, CameraSetup setup,
                       const CameraEdit& prepare = {});
 CameraSetup SetCamera(store::Store& store, const Actor& actor, const media::SourceKinds& kinds, int id,
-                      std::optional<std::int64_t> seen, const CameraEdit& edit);
+                      std::optional<std::int64_t> seen, const CameraEdit& edit, bool confirmed = false);
 
 enum class Footage { kKeep, kRemove };
 // kRemove: once the camera is gone, its recordings are taken out of every search, in many small transactions, and the

@@ -11,31 +11,12 @@ namespace lookhaven::admin {
 
 namespace {
 
-constexpr double kSecondsPerDay = 86'400;
-
 store::Mount RequireMount(store::Store& store, int id) {
     std::optional<store::Mount> mount = store::Mounts(store).Find(id);
     if (!mount) {
         throw store::NotFound("there is no mount " + std::to_string(id));
     }
     return *std::move(mount);
-}
-
-// 0 is no limit.
-bool IsLower(std::int64_t after, std::int64_t before) {
-    return after != 0 && (before == 0 || after < before);
-}
-
-// The recorder deletes within seconds what a lower limit leaves no room for.
-void RequireNoLoss(store::Store& store, const store::Mount& before, const store::Mount& after) {
-    if (!IsLower(after.max_bytes, before.max_bytes) && !IsLower(after.max_age_s, before.max_age_s)) {
-        return;
-    }
-    const std::int64_t now_s = base::WallSeconds();
-    const maintenance::RetentionForecast loss = maintenance::ForecastRetention(store, after, now_s);
-    if (loss.events > 0 && loss.events > maintenance::ForecastRetention(store, before, now_s).events) {
-        throw DeletesRecordings(loss);
-    }
 }
 
 }  // namespace
@@ -59,8 +40,7 @@ Json::Value MountRecord(const store::Mount& mount) {
     json["enabled"] = mount.enabled;
     json["default"] = mount.is_default;
     json["limit"]["bytes"] = mount.max_bytes > 0 ? Json::Value(Json::Int64{mount.max_bytes}) : Json::Value();
-    json["limit"]["days"] =
-        mount.max_age_s > 0 ? Json::Value(static_cast<double>(mount.max_age_s) / kSecondsPerDay) : Json::Value();
+    json["limit"]["days"] = DaysJson(mount.max_age_s);
     json["revision"] = Json::Int64{RevisionOf(json)};
     return json;
 }
@@ -95,8 +75,10 @@ store::Mount SetMount(store::Store& store, const Actor& actor, int id, std::opti
         RequireFreeFolder(store, RequireFolder(mount.path), id, change.take_over);
     }
     RequireCurrent(MountRecord(known), seen);
-    if (!change.confirmed) {
-        RequireNoLoss(store, known, mount);
+    if (!change.confirmed && (IsLower(mount.max_bytes, known.max_bytes) || IsLower(mount.max_age_s, known.max_age_s))) {
+        RequireNoLoss(known, mount, [&store, now_s = base::WallSeconds()](const store::Mount& limits) {
+            return maintenance::ForecastRetention(store, limits, now_s);
+        });
     }
     Apply(store, actor, [&] {
         const store::Mount before = RequireMount(store, id);

@@ -9,13 +9,12 @@
 
 #include <cstdint>
 #include <optional>
-#include <stdexcept>
 #include <string>
 
 #include <json/json.h>
 
 #include "standalone/admin/actor.h"
-#include "standalone/maintenance/retention.h"
+#include "standalone/admin/retention_limits.h"
 #include "standalone/store/mounts.h"
 
 namespace lookhaven::admin {
@@ -34,18 +33,6 @@ struct MountChange {
 
     // Applies it to the record. Throws UnusableFolder for the path, which becomes a canonical one.
     void ApplyTo(store::Mount& mount) const;
-};
-
-// A lower limit would have these recordings deleted within seconds; nothing was changed.
-class DeletesRecordings : public std::runtime_error {
-  public:
-    explicit DeletesRecordings(const maintenance::RetentionForecast& loss)
-        : std::runtime_error("this limit deletes recordings"),
-          loss_(loss) {}
-    const maintenance::RetentionForecast& Loss() const { return loss_; }
-
-  private:
-    maintenance::RetentionForecast loss_;
 };
 
 // {"id", "name", "path", "enabled", "default", "limit": {"bytes", "days"}, "revision"}; a limit is null where there is

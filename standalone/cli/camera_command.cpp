@@ -14,6 +14,7 @@
 #include "standalone/cli/commands.h"
 #include "standalone/cli/recording_hours.h"
 #include "standalone/cli/recording_options.h"
+#include "standalone/cli/retention_text.h"
 #include "standalone/cli/units.h"
 #include "standalone/pattern/pattern_source.h"
 #include "standalone/store/devices.h"
@@ -35,6 +36,7 @@ struct Request {
     std::optional<std::string> host;
     std::vector<std::string> hours;
     bool deletes_footage = false;
+    bool yes = false;
     store::PortCounts ports;
     CameraOptions options;
     RecordingOptions recording;
@@ -129,16 +131,20 @@ void Edit(admin::CameraSetup& setup, const Request& request) {
     ApplyPlan(setup, request);
 }
 
-void Change(const Console& console, const Request& request) {
+void Change(const Console& console, const Request& request) try {
     store::Store store = console.OpenStore();
     Cameras cameras(store);
     RequireCamera(cameras, request.id);
-    const admin::CameraSetup setup = admin::SetCamera(store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
-                                                      [&](admin::CameraSetup& camera) {
-                                                          ApplyHost(store, camera.camera, request);
-                                                          Edit(camera, request);
-                                                      });
+    const admin::CameraSetup setup = admin::SetCamera(
+        store, {}, pattern::AllSourceKinds(), request.id, std::nullopt,
+        [&](admin::CameraSetup& camera) {
+            ApplyHost(store, camera.camera, request);
+            Edit(camera, request);
+        },
+        request.yes);
     console.Answer(CameraData(setup.camera, setup.plan.value_or(store::NoPlan())), "Changed camera ", request.id, ".");
+} catch (const admin::DeletesRecordings& refusal) {
+    AskToConfirm(refusal);
 }
 
 void List(const Console& console) {
@@ -245,7 +251,9 @@ void AddCamera(CLI::App& program, const Console& console) {
     set.Option("id", request.id, id, Required);
     request.options.AddTo(set);
     request.recording.AddTo(set);
-    set.Option("--account", request.account, account + "; empty for none").Option("--host", request.host, host);
+    set.Option("--account", request.account, account + "; empty for none")
+        .Option("--host", request.host, host)
+        .Flag("--yes", request.yes, "Also where a lower age deletes recordings");
 
     group.Add("list", "Lists the cameras", List);
     group.Add("remove", "Removes a camera", Remove)

@@ -5,6 +5,7 @@
 #include "standalone/cli/camera_state.h"
 #include "standalone/cli/json.h"
 #include "standalone/cli/recording_options.h"
+#include "standalone/cli/retention_text.h"
 #include "standalone/cli/table.h"
 
 namespace lookhaven::cli {
@@ -31,6 +32,7 @@ constexpr Column kColumns[] = {{"id", "id"},
                                {"video", "video_type", VideoTypeText},
                                {"features", "", FeaturesText},
                                {"recorded", "recording.mode"},
+                               {"max age", "max_age", MaxAgeText},
                                {"live source", "", LiveSourceText}};
 
 }  // namespace
@@ -39,7 +41,7 @@ Json::Value CameraData(const store::Camera& camera, const store::RecordingPlan& 
     Json::Value data =
         Object("id", camera.id, "name", camera.name, "enabled", camera.enabled, "video_type",
                static_cast<int>(camera.video_type), "live_profile", camera.live_profile, "ptz", camera.ptz, "audio",
-               camera.audio, "insecure", camera.insecure, "recording", PlanData(plan));
+               camera.audio, "insecure", camera.insecure, "recording", PlanData(plan), "max_age", camera.max_age_s);
     if (camera.host_id != 0) {
         data["host"] = camera.host_id;
     }

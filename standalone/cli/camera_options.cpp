@@ -52,7 +52,9 @@ void CameraOptions::AddTo(Command& command) {
         .Switch("--ptz,!--no-ptz", ptz_, "Whether it can pan, tilt and zoom")
         .Switch("--audio,!--no-audio", audio_, "Whether it sends audio")
         .Switch("--insecure,!--secure", insecure_,
-                "Whether to accept any HTTPS certificate (initially only one that this machine trusts)");
+                "Whether to accept any HTTPS certificate (initially only one that this machine trusts)")
+        .Option("--max-age", max_age_,
+                "Age up to which its recordings are kept, such as 3d; 0 for no limit but the mount's");
     for (const auto& [name, number] : store::ProfileNames()) {
         ProfileOptions& profile = profiles_[static_cast<std::size_t>(number)];
         const std::string prefix = number == 0 ? "--" : "--" + name + "-";
@@ -74,6 +76,9 @@ void CameraOptions::ApplyTo(Camera& camera) const {
     AssignIfGiven(camera.ptz, ptz_);
     AssignIfGiven(camera.audio, audio_);
     AssignIfGiven(camera.insecure, insecure_);
+    if (max_age_) {
+        camera.max_age_s = ParseDuration(*max_age_);
+    }
     for (int number = 0; number < store::kProfileCount; ++number) {
         const ProfileOptions& given = profiles_[static_cast<std::size_t>(number)];
         if (given.source && given.source->empty()) {

@@ -18,7 +18,7 @@ class CameraOptions {
     // This object must outlive the command.
     void AddTo(Command& command);
 
-    // Throws Failure when a profile that has no source was given a size or rate.
+    // Throws Failure when a profile that has no source was given a size or rate, and for an age of another form.
     void ApplyTo(store::Camera& camera) const;
 
     bool HasType() const { return type_.has_value(); }
@@ -40,6 +40,7 @@ class CameraOptions {
     std::optional<bool> ptz_;
     std::optional<bool> audio_;
     std::optional<bool> insecure_;
+    std::optional<std::string> max_age_;
     std::array<ProfileOptions, store::kProfileCount> profiles_;
 };
 

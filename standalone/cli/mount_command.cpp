@@ -7,6 +7,7 @@
 #include "standalone/admin/mounts.h"
 #include "standalone/cli/command_group.h"
 #include "standalone/cli/commands.h"
+#include "standalone/cli/retention_text.h"
 #include "standalone/cli/table.h"
 #include "standalone/cli/units.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -40,10 +41,6 @@ Json::Value ToData(const Mount& mount) {
 
 std::string LimitText(const Json::Value& bytes) {
     return bytes.asInt64() == 0 ? "none" : FormatSize(bytes.asInt64());
-}
-
-std::string MaxAgeText(const Json::Value& seconds) {
-    return seconds.asInt64() == 0 ? "none" : FormatDuration(seconds.asInt64());
 }
 
 std::string FreeText(const Json::Value& mount) {
@@ -97,9 +94,7 @@ void Change(const Console& console, const Request& request) {
         const Mount mount = admin::SetMount(store, {}, request.id, {}, ChangeOf(console, store, request));
         console.Answer(ToData(mount), "Changed mount ", mount.name, ".");
     } catch (const admin::DeletesRecordings& refusal) {
-        const maintenance::RetentionForecast& loss = refusal.Loss();
-        throw Failure(kDataError, "this limit deletes the ", loss.events, " oldest recordings (",
-                      FormatSize(loss.bytes), "), up to ", FormatMoment(loss.end_s), "; add --yes to confirm");
+        AskToConfirm(refusal);
     }
 }
 

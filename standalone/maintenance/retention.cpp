@@ -5,9 +5,12 @@
 #include <exception>
 #include <iterator>
 #include <optional>
+#include <span>
+#include <system_error>
 #include <utility>
 #include <vector>
 
+#include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 
 namespace lookhaven::maintenance {
@@ -19,10 +22,49 @@ constexpr std::int64_t kFilesOfEvent = 2;  // with its index
 // How many events with dates in the future are skipped at most.
 constexpr std::size_t kMaxMisdated = 10'000;
 
-// By the age limit. Both walks below go in the order of recording and stop at the first event that is not, so the limit
-// must be the same for all of a mount; one of a camera needs walks of its own.
-bool IsExpired(const store::Mount& mount, const store::Event& event, std::int64_t now_s) {
-    return mount.max_age_s > 0 && event.end_s <= now_s - mount.max_age_s;
+enum class Verdict { kGoes, kGoesWithNext, kStays };
+
+// By that age limit; 0: none. What is dated in the future is as old as what was recorded after it.
+Verdict ByAge(const store::Event& event, std::int64_t max_age_s, std::int64_t now_s) {
+    return max_age_s == 0                     ? Verdict::kStays
+           : event.end_s <= now_s - max_age_s ? Verdict::kGoes
+           : event.end_s > now_s              ? Verdict::kGoesWithNext
+                                              : Verdict::kStays;
+}
+
+// Hands over what goes, page by page in the order of recording, up to the first event that stays: the limits are those
+// of all events that next_page returns, so no younger one exceeds them either.
+template <typename NextPage, typename Judge, typename Take>
+void TakeOldest(NextPage next_page, Judge judge, Take take) {
+    std::vector<store::Event> undecided;
+    store::Event after;
+    for (bool has_more = true; has_more && undecided.size() < kMaxMisdated;) {
+        const std::vector<store::Event> oldest = next_page(after);
+        std::vector<store::Event> chosen;
+        has_more = oldest.size() == kEventsPerBatch;
+        for (const store::Event& event : oldest) {
+            after = event;
+            const Verdict verdict = judge(event);
+            if (verdict == Verdict::kStays) {
+                has_more = false;
+                break;
+            }
+            undecided.push_back(event);
+            if (verdict == Verdict::kGoes) {
+                std::ranges::move(std::exchange(undecided, {}), std::back_inserter(chosen));
+            }
+        }
+        take(chosen);
+    }
+}
+
+// TakeOldest of a mount's events of a camera, by its age limit.
+template <typename Take>
+void TakeExpired(store::Events& events, int mount_id, int camera_id, std::int64_t max_age_s, std::int64_t now_s,
+                 Take take) {
+    TakeOldest(
+        [&](const store::Event& after) { return events.InRecordingOrder(mount_id, after, kEventsPerBatch, camera_id); },
+        [&](const store::Event& event) { return ByAge(event, max_age_s, now_s); }, take);
 }
 
 class Retention {
@@ -30,14 +72,18 @@ class Retention {
     Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, const RetentionClock& clock)
         : mount_(mount),
           folder_(folder),
+          cameras_(store),
           events_(store),
           deletion_(store, mount, folder, clock.now_s),
           clock_(clock),
           now_s_(clock.now_s),
-          has_age_limit_(clock.age_limit == AgeLimit::kApplies && mount.max_age_s > 0) {}
+          applies_age_(clock.age_limit == AgeLimit::kApplies) {}
 
     DeletionResult Run(DiskWatch& watch) {
         deletion_.Finish();
+        if (applies_age_) {
+            DeleteExpiredOfCameras();
+        }
         const DeletionResult finished = deletion_.Result();
         const MountSpace space = folder_.Space();
         const std::int64_t lacking_bytes = LackingBytes(space);
@@ -47,11 +93,10 @@ class Retention {
         const std::int64_t allowed_files = watch.files.Allow(lacking_files, room.files, clock_.monotonic_us);
         excess_bytes_ = std::max(BytesAboveLimit(), allowed_bytes);
         excess_files_ = allowed_files;
-        std::exception_ptr failure;
         try {
             DeleteOldest();
         } catch (...) {
-            failure = std::current_exception();  // after what has been deleted was noted
+            failure_ = std::current_exception();  // after what has been deleted was noted
         }
         const Room left = allowed_bytes > 0 || allowed_files > 0 ? MeasureRoom() : Room();
         if (allowed_bytes > 0) {
@@ -62,8 +107,8 @@ class Retention {
             watch.files.NoteDeleted(kFilesOfEvent * (deletion_.Result().events - finished.events), room.files,
                                     left.files, clock_.monotonic_us);
         }
-        if (failure) {
-            std::rethrow_exception(failure);
+        if (failure_) {
+            std::rethrow_exception(failure_);
         }
         return deletion_.Result();
     }
@@ -80,29 +125,26 @@ class Retention {
         return {space.free_bytes + content.size_bytes, space.free_files + kFilesOfEvent * content.events};
     }
 
-    void DeleteOldest() {
-        // Dated in the future: as old as what was recorded after them.
-        std::vector<store::Event> misdated;
-        store::Event after;
-        for (bool has_more = true; has_more && misdated.size() < kMaxMisdated;) {
-            const std::vector<store::Event> oldest = events_.InRecordingOrder(mount_.id, after, kEventsPerBatch);
-            std::vector<store::Event> chosen;
-            has_more = oldest.size() == kEventsPerBatch;
-            for (const store::Event& event : oldest) {
-                after = event;
-                if (TakeFromExcess(event) || (has_age_limit_ && IsExpired(mount_, event, now_s_))) {
-                    std::ranges::move(std::exchange(misdated, {}), std::back_inserter(chosen));
-                    chosen.push_back(event);
-                } else if (has_age_limit_ && event.end_s > now_s_) {
-                    misdated.push_back(event);
-                } else {
-                    // The limits are the mount's, so no younger event exceeds them either.
-                    has_more = false;
-                    break;
-                }
+    // A folder that fails is one camera's: all others keep to their ages, and the mount to its limits.
+    void DeleteExpiredOfCameras() {
+        for (const auto& [camera, max_age_s] : cameras_.MaxAges()) {
+            try {
+                TakeExpired(events_, mount_.id, camera, max_age_s, now_s_,
+                            [this](std::span<const store::Event> events) { deletion_.Delete(events); });
+            } catch (const std::system_error&) {
+                failure_ = std::current_exception();
             }
-            deletion_.Delete(chosen);
         }
+    }
+
+    void DeleteOldest() {
+        TakeOldest(
+            [this](const store::Event& after) { return events_.InRecordingOrder(mount_.id, after, kEventsPerBatch); },
+            [this](const store::Event& event) {
+                return TakeFromExcess(event) ? Verdict::kGoes
+                                             : ByAge(event, applies_age_ ? mount_.max_age_s : 0, now_s_);
+            },
+            [this](std::span<const store::Event> events) { deletion_.Delete(events); });
     }
 
     std::int64_t BytesAboveLimit() {
@@ -133,47 +175,52 @@ class Retention {
 
     const store::Mount& mount_;
     const MountFolder& folder_;
+    store::Cameras cameras_;
     store::Events events_;
     Deletion deletion_;
     const RetentionClock clock_;
     const std::int64_t now_s_;
-    const bool has_age_limit_;
+    const bool applies_age_;
+    std::exception_ptr failure_;  // the last one of this mount
     std::int64_t excess_bytes_ = 0;
     std::int64_t chosen_bytes_ = 0;
     std::int64_t excess_files_ = 0;
     std::int64_t chosen_files_ = 0;
 };
 
+void AddTo(RetentionForecast& forecast, std::span<const store::Event> events) {
+    for (const store::Event& event : events) {
+        ++forecast.events;
+        forecast.bytes += event.size_bytes;
+        forecast.end_s = std::max(forecast.end_s, event.end_s);
+    }
+}
+
 }  // namespace
 
 RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s) {
     store::Events events(store);
-    RetentionForecast forecast;
-    RetentionForecast misdated;  // in the future: as old as what was recorded after them
     const std::int64_t excess_bytes = mount.max_bytes > 0 ? events.Content(mount.id).size_bytes - mount.max_bytes : 0;
     std::int64_t bytes = 0;
-    store::Event after;
-    for (;;) {
-        const std::vector<store::Event> oldest = events.InRecordingOrder(mount.id, after, kEventsPerBatch);
-        for (const store::Event& event : oldest) {
-            after = event;
-            const bool is_deleted = bytes < excess_bytes || IsExpired(mount, event, now_s);
-            const bool may_be_deleted = mount.max_age_s > 0 && event.end_s > now_s;
-            if (!is_deleted && !may_be_deleted) {
-                return forecast;
-            }
-            bytes += event.size_bytes;
-            misdated = {misdated.events + 1, misdated.bytes + event.size_bytes, std::max(misdated.end_s, event.end_s)};
-            if (is_deleted) {
-                forecast = {forecast.events + misdated.events, forecast.bytes + misdated.bytes,
-                            std::max(forecast.end_s, misdated.end_s)};
-                misdated = {};
-            }
-        }
-        if (oldest.size() < kEventsPerBatch) {
-            return forecast;
-        }
+    RetentionForecast forecast;
+    TakeOldest([&](const store::Event& after) { return events.InRecordingOrder(mount.id, after, kEventsPerBatch); },
+               [&](const store::Event& event) {
+                   const bool is_in_excess = bytes < excess_bytes;
+                   bytes += event.size_bytes;
+                   return is_in_excess ? Verdict::kGoes : ByAge(event, mount.max_age_s, now_s);
+               },
+               [&](std::span<const store::Event> page) { AddTo(forecast, page); });
+    return forecast;
+}
+
+RetentionForecast ForecastRetention(store::Store& store, int camera_id, std::int64_t max_age_s, std::int64_t now_s) {
+    store::Events events(store);
+    RetentionForecast forecast;
+    for (const store::Mount& mount : store::Mounts(store).List()) {
+        TakeExpired(events, mount.id, camera_id, max_age_s, now_s,
+                    [&](std::span<const store::Event> page) { AddTo(forecast, page); });
     }
+    return forecast;
 }
 
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk.
+// Deletes a mount's oldest recordings until it is within its age limit, its size limit and the free space of its disk,
+// and those of its cameras that have a maximum age of their own until they are within that.
 //
 // Invariants    (1) Only what a row names is deleted: an empty store deletes nothing, and unknown files stay.
 //               (2) Kept and growing events and those on unmounted mounts stay.
@@ -36,9 +37,11 @@ struct DiskWatch {
 
 // Deletes events, the oldest first: those older than the mount's age limit, and as many as exceed its size limit or as
 // are needed to have three times the disk's reserve free once less than twice the reserve is; for the latter no more
-// than the watch allows. An event is kept while one recorded before it is not old enough. The result is empty for a
-// mount that is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says
-// nothing about others: handle each mount by itself, and try again later. The events deleted until then stay deleted.
+// than the watch allows. Before them, those older than their camera's maximum age. An event is kept while one recorded
+// before it, to the mount or for a camera's age by the camera, is not old enough. The result is empty for a mount that
+// is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says nothing about
+// others: handle each mount by itself, and try again later. The events deleted until then stay deleted, and trouble
+// with one camera's does not keep others'.
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
                                 DiskWatch& watch);
 
@@ -49,5 +52,7 @@ struct RetentionForecast {
     std::int64_t end_s = 0;  // of the youngest event
 };
 RetentionForecast ForecastRetention(store::Store& store, const store::Mount& mount, std::int64_t now_s);
+// What that maximum age of a camera would have it delete, on all mounts.
+RetentionForecast ForecastRetention(store::Store& store, int camera_id, std::int64_t max_age_s, std::int64_t now_s);
 
 }  // namespace lookhaven::maintenance

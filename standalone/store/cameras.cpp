@@ -39,6 +39,7 @@ void RequireValid(const CameraProfile& profile) {
 void RequireValid(const Camera& camera) {
     RequireRule(!camera.name.empty() && IsPlainText(camera.name, kMaxNameBytes),
                 "a camera's name is 1 to 255 bytes of UTF-8 without control characters");
+    RequireRule(camera.max_age_s >= 0, "the maximum age of a camera's recordings is not below 0");
     RequireRule(base::IsVideo(camera.video_type), "a camera's video is MJPEG, H.264 or H.265");
     bool seen[kProfileCount] = {};
     for (const CameraProfile& profile : camera.profiles) {
@@ -55,10 +56,10 @@ template <>
 struct Mapping<Camera> {
     static constexpr const char* kTable = "cameras";
     static constexpr const char* kColumns =
-        "id, name, enabled, video_type, live_profile, ptz, audio, insecure, host_id";
+        "id, name, enabled, video_type, live_profile, ptz, audio, insecure, host_id, max_age";
     static auto Members(auto& camera) {
         return std::tie(camera.id, camera.name, camera.enabled, camera.video_type, camera.live_profile, camera.ptz,
-                        camera.audio, camera.insecure, camera.host_id);
+                        camera.audio, camera.insecure, camera.host_id, camera.max_age_s);
     }
 };
 
@@ -164,6 +165,11 @@ std::optional<Camera> Cameras::Find(int id) {
 
 std::vector<Camera> Cameras::List() {
     return FetchCameras(connection_, "");
+}
+
+std::map<int, std::int64_t> Cameras::MaxAges() {
+    return connection_.FetchAll<std::pair<int, std::int64_t>, std::map<int, std::int64_t>>(
+        "select id, max_age from cameras where max_age > 0");
 }
 
 void Cameras::SetOrder(const std::vector<int>& ids) {

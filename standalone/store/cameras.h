@@ -3,6 +3,8 @@
 // Cameras: what they are called, where their streams come from, what they can do.
 #pragma once
 
+#include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -36,6 +38,7 @@ struct Camera {
     bool insecure = false;                // its HTTPS certificate is not verified
     std::vector<CameraProfile> profiles;  // by number, at least the live one
     int host_id = 0;                      // the host of store/hosts.h that records it; 0: whichever has room
+    std::int64_t max_age_s = 0;           // retention removes recordings that are older, on any mount; 0: no limit
 
     // Null when the camera lacks that profile.
     const CameraProfile* FindProfile(int number) const;
@@ -68,6 +71,8 @@ class Cameras {
 
     std::optional<Camera> Find(int id);
     std::vector<Camera> List();  // in their order; a new camera comes last
+    // By camera, those without one left out.
+    std::map<int, std::int64_t> MaxAges();
     // ids: all cameras, each once. Throws InvalidRecord.
     void SetOrder(const std::vector<int>& ids);
 

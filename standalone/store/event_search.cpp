@@ -136,11 +136,14 @@ std::vector<Event> Events::PendingDeletion(int mount_id) {
     return events;
 }
 
-std::vector<Event> Events::InRecordingOrder(int mount_id, const Event& after, int limit) {
-    return connection_.FetchAll<Event>(
-        "where mount_id = :mount and (recording_order, id) > (:after_order, :after_id) and recording = 0"
-        " and archived = 0 and demo = 0 order by recording_order, id limit :limit",
-        mount_id, after.order, after.id, limit);
+std::vector<Event> Events::InRecordingOrder(int mount_id, const Event& after, int limit, std::optional<int> camera_id) {
+    const std::string mount = "where mount_id = :mount";
+    const std::string behind =
+        " and (recording_order, id) > (:after_order, :after_id) and recording = 0 and archived = 0 and demo = 0"
+        " order by recording_order, id limit :limit";
+    return camera_id ? connection_.FetchAll<Event>(mount + " and camera_id = :camera" + behind, mount_id, *camera_id,
+                                                   after.order, after.id, limit)
+                     : connection_.FetchAll<Event>(mount + behind, mount_id, after.order, after.id, limit);
 }
 
 std::optional<std::string> Events::PathPendingDeletion(int id) {

@@ -161,8 +161,9 @@ class Events {
     // Those still marked as being written; after a crash, what has to be finished. By id.
     std::vector<Event> Open();
     // Finished events of the mount that are neither kept nor demo, in the order in which they were recorded: those
-    // after that event, from the first on after Event().
-    std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit);
+    // after that event, from the first on after Event(). camera_id: those of that camera alone, which takes no longer.
+    std::vector<Event> InRecordingOrder(int mount_id, const Event& after, int limit,
+                                        std::optional<int> camera_id = std::nullopt);
     // The file's path of an event whose row is pending deletion; nothing when there is no such row.
     std::optional<std::string> PathPendingDeletion(int id);
     // Gives the mount's rows of a recorder of an earlier version, which has no order of recording, that of their ids.

@@ -253,6 +253,13 @@ constexpr const char* kLoads[] = {
     "alter table hosts add column processors integer not null default 0",
 };
 
+// For cameras whose recordings go earlier than others on their mount.
+constexpr const char* kMaxAgesOfCameras[] = {
+    "alter table cameras add column max_age bigint not null default 0",
+    ("create index events_of_camera_by_order on events (camera_id, mount_id, recording_order, id)"
+     " where recording = 0 and archived = 0 and demo = 0"),
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -279,6 +286,7 @@ constexpr Migration kMigrations[] = {
      .is_addition = true},
     {.purpose = "access tokens", .statements = kAccessTokens, .is_addition = true},
     {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
+    {.purpose = "the maximum age of a camera's recordings", .statements = kMaxAgesOfCameras, .is_addition = true},
 };
 
 }  // namespace

@@ -82,6 +82,12 @@ TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
           {"mount list", 0, "none", "Old"},
           {"mount set 1 --max-age 30d --yes", 0, "Changed"},
           {"mount set 1 --max-age 31d", 0, "Changed"},
+          {"camera set 1 --max-age 3d --name Old", 65, "deletes the 1 oldest recordings"},
+          {"camera list", 0, "none", "Old"},
+          {"camera set 1 --max-age 3d --yes --json", 0, "\"max_age\" : 259200"},
+          {"camera set 1 --max-age 4d", 0, "Changed"},
+          {"camera list", 0, "4d"},
+          {"audit --limit 1 --json", 0, "\"limitDays\" : 4"},
           {"mount remove 1", 65, "--forget"},
           {"mount remove 1 --forget", 0, "files stay"},
           {"event list", 0, "no such event"}});

@@ -14,6 +14,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/retention.h"
+#include "standalone/store/cameras.h"
 #include "test/support/folder.h"
 #include "test/support/footage/footage.h"
 
@@ -32,6 +33,13 @@ class RetentionTest : public testing::Test {
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
         return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_);
+    }
+
+    void LimitAge(int camera, std::int64_t max_age_s) {
+        store::Cameras cameras(footage_.Records());
+        store::Camera record = *cameras.Find(camera);
+        record.max_age_s = max_age_s;
+        cameras.Update(record);
     }
 
     std::vector<int> Left() {

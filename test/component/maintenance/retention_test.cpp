@@ -64,6 +64,39 @@ TEST_F(RetentionTest, AWrongDateNeitherDeletesNorKeeps) {
     EXPECT_THAT(Left(), ElementsAre(past)) << "recorded last";
 }
 
+TEST_F(RetentionTest, ACameraOfALowerAgeLosesItsOwnRecordingsAlone) {
+    const int others = footage_.Record(1, kNow - 900, 60);
+    const int kept = footage_.Record(2, kNow - 900, 60);
+    const int future = footage_.Record(2, kNow + 400 * 86400, 60);
+    const int old = footage_.Record(2, kNow - 500, 60);
+    const int of_removed = footage_.Record(3, kNow - 500, 60);
+    const int young = footage_.Record(2, kNow - 60, 60);
+    const int past = footage_.Record(2, 1000, 60);
+    footage_.Mark(1, 2, kNow - 490, 5, "Door", old);
+    store::KeptEvents(footage_.Records()).Keep(std::array{kept}, {});
+    LimitAge(2, 100);
+    LimitAge(3, 100);
+    store::Cameras(footage_.Records()).Remove(3);
+    EXPECT_EQ(Run(0, 0, AgeLimit::kWaits).events, 0);
+    const DeletionResult removed = Run(0, 700);
+    EXPECT_EQ(removed.events, 3) << "that of the mount's age, too";
+    EXPECT_EQ(removed.marks, 1);
+    EXPECT_THAT(Left(), ElementsAre(kept, of_removed, young, past)) << others << ", " << future << ", " << old;
+}
+
+TEST_F(RetentionTest, ACameraWhoseFilesCannotBeRemovedStopsNoOther) {
+    const int stuck = footage_.Record(1, kNow - 900, 60);
+    const int of_camera = footage_.Record(2, kNow - 500, 60);
+    const int young = footage_.Record(2, kNow - 60, 60);
+    const fs::path file = footage_.FileOf(stuck);
+    fs::remove(file);
+    fs::create_directory(file);
+    LimitAge(1, 100);
+    LimitAge(2, 100);
+    EXPECT_THROW(Run(0), std::system_error);
+    EXPECT_THAT(Left(), ElementsAre(stuck, young)) << of_camera;
+}
+
 TEST_F(RetentionTest, WhatIsKeptOnPurposeOrUnknownStays) {
     const int kept = footage_.Record(1, kNoon, 60);
     const int growing = footage_.Record(1, kNoon + 100, 60);

@@ -29,7 +29,8 @@ TEST_P(CameraTest, RecordsComeBackAsTheyWerePut) {
             .ptz = true,
             .audio = true,
             .insecure = true,
-            .profiles = {{0, "file:/tmp/a b'c.mkv", 1280, 720, 25}, {2, "https://[2001:db8::1]:8443/x", 0, 0, 0}}};
+            .profiles = {{0, "file:/tmp/a b'c.mkv", 1280, 720, 25}, {2, "https://[2001:db8::1]:8443/x", 0, 0, 0}},
+            .max_age_s = 5'000'000'000};
         camera.id = cameras_.Add(camera);
         EXPECT_EQ(cameras_.Find(camera.id), camera);
         std::swap(camera.ptz, camera.enabled);
@@ -68,6 +69,7 @@ TEST_P(CameraTest, BrokenRecordsChangeNothing) {
     refused("size", [](Camera& camera) { camera.profiles[0].width = 8193; });
     refused("height", [](Camera& camera) { camera.profiles[0].height = -1; });
     refused("rate", [](Camera& camera) { camera.profiles[0].fps = 121; });
+    refused("age", [](Camera& camera) { camera.max_age_s = -1; });
     refused("codec", [](Camera& camera) { camera.video_type = static_cast<base::Codec>(2); });
     EXPECT_TRUE(cameras_.List().empty());
     EXPECT_EQ(settings_.Revision(), before);

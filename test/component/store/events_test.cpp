@@ -101,6 +101,8 @@ TEST_P(EventTest, SearchFindsWhatALookAtEveryEventFinds) {
         std::erase_if(rows, [](const Event& event) { return event.recording || event.kept; });
         std::ranges::sort(rows, {}, &Event::id);
         EXPECT_EQ(events_.InRecordingOrder(mount, {}, 1000), rows) << mount;
+        std::erase_if(rows, [](const Event& row) { return row.camera_id != 2; });
+        EXPECT_EQ(events_.InRecordingOrder(mount, {}, 1000, 2), rows) << mount;
     }
     const auto demo = std::ranges::count_if(all, &Event::demo);
     EXPECT_EQ(events_.RemoveDemo(), demo);
