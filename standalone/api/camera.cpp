@@ -10,6 +10,7 @@
 #include "standalone/admin/change.h"
 #include "standalone/api/camera_fields.h"
 #include "standalone/api/camera_page.h"
+#include "standalone/api/confirm.h"
 #include "standalone/api/fields.h"
 #include "standalone/api/named_list.h"
 #include "standalone/api/password_check.h"
@@ -99,10 +100,15 @@ std::string Add(const Call& call) {
 std::string Set(const Call& call) {
     RequireNoPasswordInQuery(call);
     const std::int64_t seen = SeenRevision(call);
-    return OnCurrentRecord(Completer(call), [&] {
-        return CameraAnswer(call,
-                            admin::SetCamera(call.Records(), call.Actor(), camera::NetworkKinds(), RequireId(call),
-                                             seen, [&](admin::CameraSetup& setup) { TakeCameraFields(call, setup); }));
+    bool is_confirmed = false;
+    TakeField(call, "confirm", is_confirmed);
+    return OrConfirm([&] {
+        return OnCurrentRecord(Completer(call), [&] {
+            return CameraAnswer(call,
+                                admin::SetCamera(
+                                    call.Records(), call.Actor(), camera::NetworkKinds(), RequireId(call), seen,
+                                    [&](admin::CameraSetup& setup) { TakeCameraFields(call, setup); }, is_confirmed));
+        });
     });
 }
 

@@ -138,6 +138,7 @@ void TakeCameraFields(const Call& call, admin::CameraSetup& setup) {
     TakeField(call, "audio", camera.audio);
     TakeField(call, "ptz", camera.ptz);
     TakeField(call, "liveProfile", camera.live_profile);
+    camera.max_age_s = AgeLimitIn(call, "limitDays").value_or(camera.max_age_s);
     TakeSources(call.Parameter("source"), camera);
     if (LiveAddress(camera) != LiveAddress(before.camera)) {
         // Until the recorder has seen it, unless the caller has.

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/api/fields.h"
 
+#include <cmath>
+
 namespace lookhaven::api {
 
 void RefuseField(const std::string& name, const std::string& what) {
@@ -46,6 +48,27 @@ int IdIn(const Call& call, const char* name) {
         RefuseField(name, "a number");
     }
     return id.isInt() ? id.asInt() : 0;
+}
+
+std::optional<std::int64_t> LimitIn(const Call& call, const std::string& name, double max, double unit) {
+    if (!call.parameters.contains(name)) {
+        return std::nullopt;
+    }
+    const Json::Value& value = call.Parameter(name);
+    if (value.isNull()) {
+        return 0;
+    }
+    const double number = value.isNumeric() ? value.asDouble() : 0;
+    if (!(number * unit >= 1 && number <= max)) {
+        RefuseField(name, "a number above 0, or null for no limit");
+    }
+    return std::llround(number * unit);
+}
+
+std::optional<std::int64_t> AgeLimitIn(const Call& call, const std::string& name) {
+    constexpr double kMaxDays = 36'500;
+    constexpr double kDayS = 86'400;
+    return LimitIn(call, name, kMaxDays, kDayS);
 }
 
 }  // namespace lookhaven::api

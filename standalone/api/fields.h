@@ -5,6 +5,8 @@
 // Failures      Each throws Failure 400, which names the field.
 #pragma once
 
+#include <cstdint>
+#include <optional>
 #include <string>
 
 #include "standalone/api/call.h"
@@ -27,6 +29,12 @@ void TakeField(const Call& call, const char* name, std::string& target);
 
 // The id in that parameter, which must be there; 0, which nothing has, where it is larger than any.
 int IdIn(const Call& call, const char* name);
+
+// The limit in that parameter, a number above 0, up to max, in units; null is 0, which is none. Nothing where the
+// parameter is missing.
+std::optional<std::int64_t> LimitIn(const Call& call, const std::string& name, double max, double unit);
+// The same of an age in days, as seconds.
+std::optional<std::int64_t> AgeLimitIn(const Call& call, const std::string& name);
 
 // As Take, for one of the words.
 template <typename Value>

@@ -16,6 +16,8 @@
 #include "standalone/admin/mount_forecast.h"
 #include "standalone/admin/mount_place.h"
 #include "standalone/admin/mounts.h"
+#include "standalone/api/confirm.h"
+#include "standalone/api/fields.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/revision.h"
 #include "standalone/archive/layout.h"
@@ -38,7 +40,6 @@ constexpr std::int64_t kDayS = 86'400;
 constexpr std::int64_t kRateDays = 7;
 constexpr int kHistoryDays = 30;
 constexpr double kMaxLimitBytes = 9e15;  // exact in JavaScript
-constexpr double kMaxLimitDays = 36'500;
 
 // What all mounts are described by.
 struct MountContext {
@@ -194,22 +195,6 @@ auto Completer(const Call& call) {
     };
 }
 
-// The limit in a parameter: a number above 0, in units. Null is no limit; a missing parameter changes nothing.
-std::optional<std::int64_t> LimitOf(const Call& call, const std::string& name, double max, double unit) {
-    if (!call.parameters.contains(name)) {
-        return std::nullopt;
-    }
-    const Json::Value& value = call.Parameter(name);
-    if (value.isNull()) {
-        return 0;
-    }
-    const double number = value.isNumeric() ? value.asDouble() : 0;
-    if (!(number * unit >= 1 && number <= max)) {
-        throw Failure(400, name + " must be a number above 0, or null for no limit");
-    }
-    return std::llround(number * unit);
-}
-
 admin::MountChange ChangeOf(const Call& call) {
     admin::MountChange change;
     if (const Json::Value& name = call.Parameter("name"); !name.isNull()) {
@@ -218,8 +203,8 @@ admin::MountChange ChangeOf(const Call& call) {
     if (const Json::Value& enabled = call.Parameter("enabled"); !enabled.isNull()) {
         change.enabled = enabled.asBool();
     }
-    change.max_bytes = LimitOf(call, "limitBytes", kMaxLimitBytes, 1);
-    change.max_age_s = LimitOf(call, "limitDays", kMaxLimitDays, kDayS);
+    change.max_bytes = LimitIn(call, "limitBytes", kMaxLimitBytes, 1);
+    change.max_age_s = AgeLimitIn(call, "limitDays");
     change.is_default = call.Parameter("default").asBool();
     change.confirmed = call.Parameter("confirm").asBool();
     return change;
@@ -253,18 +238,12 @@ std::string Add(const Call& call) {
 std::string Set(const Call& call) {
     const std::int64_t seen = SeenRevision(call);
     const admin::MountChange change = ChangeOf(call);
-    try {
+    return OrConfirm([&] {
         return AnswerRecord(call, OnCurrentRecord(Completer(call), [&] {
                                 return admin::SetMount(call.Records(), call.Actor(), call.Parameter("id").asInt(), seen,
                                                        change);
                             }));
-    } catch (const admin::DeletesRecordings& refusal) {
-        Json::Value data;
-        data["confirm"]["events"] = Json::Int64{refusal.Loss().events};
-        data["confirm"]["bytes"] = Json::Int64{refusal.Loss().bytes};
-        data["confirm"]["until"] = Json::Int64{refusal.Loss().end_s};
-        return SuccessAnswer(data);
-    }
+    });
 }
 
 std::string Remove(const Call& call) {

@@ -2,6 +2,7 @@
 //
 // Cameras as managers set them up. All of it is for managers only.
 
+import type { Unconfirmed } from "./footage_loss";
 import type { Server } from "./server";
 
 export interface Named {
@@ -54,6 +55,8 @@ export interface CameraSettings {
   /** Ids of its groups. */
   group: number[];
   plan: RecordingPlan;
+  /** Its recordings are deleted when they are older, whatever their mount allows; null: no limit but the mount's. */
+  limitDays: number | null;
 }
 
 export interface CameraRecord extends CameraSettings {
@@ -145,15 +148,16 @@ export class CameraSetup {
   }
 
   /**
-   * Without `password` the stored one stays; empty: none. Rejects with status 409 and the record where `revision` is
-   * stale.
+   * Without `password` the stored one stays; empty: none. Where a new limit would delete recordings nothing changes and
+   * the loss comes back, unless `confirm`. Rejects with status 409 and the record where `revision` is stale.
    */
-  async set(
+  set(
     id: number,
     revision: number,
     changes: Partial<CameraSettings> & { password?: string },
-  ): Promise<CameraRecord> {
-    return (await this.#call<{ camera: CameraRecord }>("Set", { id, revision, ...changes })).camera;
+    confirm: boolean,
+  ): Promise<{ camera: CameraRecord } | Unconfirmed> {
+    return this.#call("Set", { id, revision, ...changes, ...(confirm ? { confirm } : {}) });
   }
 
   remove({ id, revision }: RecordKey, footage: "keep" | "remove"): Promise<unknown> {

@@ -3,6 +3,7 @@
 // Mounts: where recordings are kept, how much of it is used, and for how long it lasts. For managers only.
 
 import type { RecordKey } from "./camera_setup";
+import type { Unconfirmed } from "./footage_loss";
 import type { Server } from "./server";
 
 /** What a manager may change. */
@@ -40,14 +41,6 @@ export interface MountRecord extends Omit<MountSettings, "limitBytes" | "limitDa
   camera: { id: number; name: string; perDay: number }[];
 }
 
-/** What a new limit would delete at once. */
-export interface MountLoss {
-  events: number;
-  bytes: number;
-  /** Unix seconds: everything before. */
-  until: number;
-}
-
 const kApi = "VEXO.Mount";
 
 export class Mounts {
@@ -74,7 +67,7 @@ export class Mounts {
     revision: number,
     changes: Partial<MountSettings>,
     confirm: boolean,
-  ): Promise<{ mount: MountRecord } | { confirm: MountLoss }> {
+  ): Promise<{ mount: MountRecord } | Unconfirmed> {
     return this.#call("Set", { id, revision, ...changes, confirm });
   }
 

@@ -64,7 +64,7 @@ export class FakeSetup {
     "VEXO.Camera.List": () => ok({ camera: this.camera, order: this.#order(), group: this.group, mount: [], path: [{ name: "first stream", path: "/stream1" }] }),
     "VEXO.Camera.Probe": () => ok(this.probe),
     "VEXO.Camera.Add": (request) => this.#note("Camera.Add", request, ok({ camera: { revision: 1, ...request } })),
-    "VEXO.Camera.Set": (request) => this.#set("camera", request),
+    "VEXO.Camera.Set": (request) => (request.limitDays && !request.confirm ? ok({ confirm: this.loss }) : this.#set("camera", request)),
     "VEXO.Camera.Order": (request) => this.#setOrder(request),
     "VEXO.User.List": () => ok({ user: this.user, camera: this.camera, group: [{ id: 1, name: "Outside", camera: [2] }], door: [], ioModule: [], emap: [] }),
     "VEXO.User.Set": (request) => ("reauth" in request && request.reauth !== "right" ? failed(403, "The password is wrong.") : this.#set("user", request)),
@@ -199,7 +199,7 @@ export class FakeSetup {
 
 export function cameraRecord(id: number, name: string): CameraRecord {
   const plan = { mode: "always" as const, segment: 600, pre: 10, post: 30, mount: 0, profile: 0, hours: "1".repeat(168) };
-  const settings = { name, enabled: true, account: "", insecure: false, audio: false, ptz: false, liveProfile: 0, group: [], plan };
+  const settings = { name, enabled: true, account: "", insecure: false, audio: false, ptz: false, liveProfile: 0, group: [], plan, limitDays: null };
   const seen = { codec: "h264", state: "connecting" as const, reason: "", recording: "", since: null, rate: 0, bytes: 0 };
   const footage = { events: 0, bytes: 0, oldest: null };
   return { id, revision: 1, order: id, hasPassword: true, source: [{ profile: 0, address: `rtsp://camera-${id}/a` }], footage, ...settings, ...seen };

@@ -305,14 +305,21 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await page.getByRole("rowheader", { name: "removed camera" }).waitFor();
     await page.getByRole("link", { name: "Change Disk" }).click();
     await page.getByLabel("Days").fill("30");
-    for (const answer of ["Cancel", "Save and delete"]) {
-      await save(page);
-      const dialog = page.getByRole("dialog", { name: "Delete footage?" });
-      await dialog.getByText("12 events with 3.0 GB").waitFor();
-      expect(setup.asked).toEqual([]);
-      await dialog.getByRole("button", { name: answer }).click();
-    }
-    await page.getByText("The mount is saved.").waitFor();
-    expect(setup.asked).toEqual([["mount", { id: 1, revision: 1, limitDays: 30, confirm: true }]]);
+    const saveAsking = async (kind: string) => {
+      for (const answer of ["Cancel", "Save and delete"]) {
+        await save(page);
+        const dialog = page.getByRole("dialog", { name: "Delete footage?" });
+        await dialog.getByText("12 events with 3.0 GB").waitFor();
+        expect(setup.asked).toEqual([]);
+        await dialog.getByRole("button", { name: answer }).click();
+      }
+      await page.getByText(`The ${kind} is saved.`).waitFor();
+    };
+    await saveAsking("mount");
+    expect(setup.asked.splice(0)).toEqual([["mount", { id: 1, revision: 1, limitDays: 30, confirm: true }]]);
+    await page.goto(`${client.address}#settings=cameras&open=2`);
+    await page.getByLabel("Days kept").fill("3");
+    await saveAsking("camera");
+    expect(setup.asked).toEqual([["camera", { id: 2, revision: 1, limitDays: 3, confirm: true }]]);
   }, 20_000);
 });

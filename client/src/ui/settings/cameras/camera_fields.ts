@@ -13,11 +13,21 @@ import type {
 } from "../../../wire/camera_setup";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
-import { checkField, chipsField, formPart, selectField, textField, type ChipsField } from "../../widgets/fields";
+import {
+  checkField,
+  chipsField,
+  formPart,
+  numberField,
+  selectField,
+  textField,
+  type ChipsField,
+} from "../../widgets/fields";
 import type { RecordFields } from "../record_page";
 import { addressProblem } from "./address";
 import { ConnectionFields } from "./connection_fields";
 import { kProfiles, PlanField } from "./plan_field";
+
+const kDaysKept = "Older recordings of this camera are deleted. Leave empty to keep them as long as their mount allows.";
 
 export class CameraFields implements RecordFields<CameraSettings> {
   readonly content: HTMLElement[];
@@ -33,6 +43,7 @@ export class CameraFields implements RecordFields<CameraSettings> {
   );
   readonly #groups: ChipsField;
   readonly #plan: PlanField;
+  readonly #days = numberField("Days kept", 0.01, 36_500, kDaysKept);
   readonly #rest = element("div", { class: "form-group" });
   readonly #skip = button("Skip the test", () => this.#showRest(), "plain");
   #codec = "";
@@ -52,7 +63,7 @@ export class CameraFields implements RecordFields<CameraSettings> {
     this.#groups.root.append(button("New group…", () => void this.#addGroup(addGroup), "plain"));
     this.#enabled.root.hidden = camera === null;
     const about = [this.#name, this.#enabled, this.#groups, this.#live, this.#audio, this.#ptz];
-    this.#rest.append(formPart("Camera", ...about.map(({ root }) => root)), formPart("Recording", this.#plan.root));
+    this.#rest.append(formPart("Camera", ...about.map(({ root }) => root)), formPart("Recording", this.#plan.root, this.#days.root));
     this.#rest.hidden = !isWhole;
     this.#skip.hidden = isWhole;
     this.content = [formPart("Connection", this.#connection.root, this.#skip), this.#rest];
@@ -68,6 +79,7 @@ export class CameraFields implements RecordFields<CameraSettings> {
       liveProfile: Number(this.#live.value),
       group: this.#groups.value,
       plan: this.#plan.value,
+      limitDays: this.#days.value,
     };
   }
 
@@ -80,6 +92,7 @@ export class CameraFields implements RecordFields<CameraSettings> {
     this.#live.value = String(settings.liveProfile);
     this.#groups.value = settings.group;
     this.#plan.value = settings.plan;
+    this.#days.value = settings.limitDays;
   }
 
   /** As the probe reported it; empty before. */

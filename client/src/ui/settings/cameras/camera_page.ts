@@ -11,6 +11,7 @@ import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
 import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
+import { saveWithConsent } from "../save_with_consent";
 import { askForGroup } from "../groups/ask_for_group";
 import { CameraFields } from "./camera_fields";
 import { stateText } from "./camera_row";
@@ -19,7 +20,7 @@ import { kProfiles } from "./plan_field";
 import { askToRemove } from "./remove_camera";
 
 function settingsOf(camera: CameraRecord): CameraSettings {
-  const { name, enabled, account, insecure, audio, ptz, liveProfile, group } = camera;
+  const { name, enabled, account, insecure, audio, ptz, liveProfile, group, limitDays } = camera;
   const { mode, segment, pre, post, mount, profile, hours } = camera.plan;
   return {
     name,
@@ -32,6 +33,7 @@ function settingsOf(camera: CameraRecord): CameraSettings {
     liveProfile,
     group: [...group].sort((one, other) => one - other),
     plan: { mode, segment, pre, post, mount, profile, hours },
+    limitDays,
   };
 }
 
@@ -51,6 +53,7 @@ const kKind: RecordKind<CameraSettings, CameraRecord> = {
     liveProfile: 0,
     group: [],
     plan: kFirstPlan,
+    limitDays: null,
   },
   settingsOf,
 };
@@ -96,6 +99,7 @@ export class CameraPage extends RecordPage<CameraSetupList, CameraSettings, Came
       liveProfile: ["Stream of the live view", (profile) => kProfiles[profile] ?? ""],
       group: ["Groups", (ids) => namesOf(ids).join(", ")],
       plan: ["Recording", (plan) => planText(plan, mount)],
+      limitDays: ["Days kept", (days) => (days === null ? "as its mount allows" : String(days))],
     };
   }
 
@@ -107,15 +111,19 @@ export class CameraPage extends RecordPage<CameraSetupList, CameraSettings, Came
     return [formPart("Remove", button("Remove this camera…", (pressed) => void this.#remove(id, pressed), "plain"))];
   }
 
-  protected save(
+  protected async save(
     settings: CameraSettings,
     base: CameraRecord | null,
     { password, codec }: CameraFields,
-  ): Promise<CameraRecord> {
+  ): Promise<CameraRecord | null> {
+    if (!base) {
+      const { enabled: _, ...added } = settings;
+      return this.#setup.add(added, password ?? "", codec);
+    }
     const secret = password === undefined ? {} : { password };
-    if (base) return this.#setup.set(base.id, base.revision, { ...changedFrom(settingsOf(base), settings), ...secret });
-    const { enabled: _, ...added } = settings;
-    return this.#setup.add(added, password ?? "", codec);
+    const changes = { ...changedFrom(settingsOf(base), settings), ...secret };
+    const set = (confirm: boolean) => this.#setup.set(base.id, base.revision, changes, confirm);
+    return (await saveWithConsent(this.root, set))?.camera ?? null;
   }
 
   async #remove(id: number, pressed: HTMLButtonElement): Promise<void> {

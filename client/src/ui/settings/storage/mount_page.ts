@@ -1,19 +1,20 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// One mount: where it is, and what limits it. Nothing is deleted before the user has seen how much that is.
+// One mount: where it is, and what limits it.
 
-import { Mounts, type MountLoss, type MountRecord } from "../../../wire/mounts";
-import { bytesText, counted } from "../../widgets/amounts";
+import { Mounts, type MountRecord } from "../../../wire/mounts";
+import { bytesText } from "../../widgets/amounts";
 import { button } from "../../widgets/button";
 import { element } from "../../widgets/dom";
 import { formPart } from "../../widgets/fields";
 import { openDialog } from "../../widgets/form_dialog";
 import { notify } from "../../widgets/notice";
-import { minuteText, yesNo } from "../../widgets/text";
+import { yesNo } from "../../widgets/text";
 import type { Descriptions } from "../conflict_panel";
 import { changedFrom } from "../merge";
 import type { PageContext } from "../page";
 import { RecordPage, type RecordKind } from "../record_page";
+import { saveWithConsent } from "../save_with_consent";
 import { MountFields, type MountFormSettings as Settings } from "./mount_fields";
 
 function settingsOf({ name, path, enabled, default: isDefault, limit }: MountRecord): Settings {
@@ -64,29 +65,8 @@ export class MountPage extends RecordPage<MountRecord[], Settings, MountRecord, 
     const { path, enabled, ...rest } = settings;
     if (!base) return this.#mounts.add({ ...rest, path });
     const { path: _, ...changes } = changedFrom(settingsOf(base), settings);
-    const answer = await this.#mounts.set(base.id, base.revision, changes, false);
-    if ("mount" in answer) return answer.mount;
-    return this.#askForLoss(answer.confirm, () => this.#mounts.set(base.id, base.revision, changes, true));
-  }
-
-  /** Null where the user would rather keep it. */
-  async #askForLoss(
-    { events, bytes, until }: MountLoss,
-    save: () => ReturnType<Mounts["set"]>,
-  ): Promise<MountRecord | null> {
-    const what = `${counted(events, "event")} with ${bytesText(bytes)} of footage`;
-    const sentence = `These limits would delete ${what}: everything before ${minuteText(until * 1000)}.`;
-    let saved: MountRecord | null = null;
-    await openDialog(this.root, {
-      title: "Delete footage?",
-      content: [element("p", {}, sentence)],
-      submit: "Save and delete",
-      attempt: async () => {
-        const answer = await save();
-        if ("mount" in answer) saved = answer.mount;
-      },
-    });
-    return saved;
+    const set = (confirm: boolean) => this.#mounts.set(base.id, base.revision, changes, confirm);
+    return (await saveWithConsent(this.root, set))?.mount ?? null;
   }
 
   async #remove(): Promise<void> {
