@@ -29,10 +29,11 @@ TEST(MountApi, ADiskIsAddedToldOfLimitedAndRemoved) {
     footage.Record(1, start_s, 60);
     store::Settings(footage.Records()).Set(store::kMountFoldersSetting, disks.Path().string());
     const std::string cookie = host.LogIn().secret;
-    const auto ask = [&](const std::string& method, const std::string& body) {
-        return host.Ask("api=VEXO.Mount&version=1&method=" + method, cookie, {{"CONTENT_TYPE", "application/json"}},
-                        body);
+    const auto ask_of = [&](const std::string& api, const std::string& method, const std::string& body) {
+        return host.Ask("api=VEXO." + api + "&version=1&method=" + method, cookie,
+                        {{"CONTENT_TYPE", "application/json"}}, body);
     };
+    const auto ask = [&](const std::string& method, const std::string& body) { return ask_of("Mount", method, body); };
     const auto add = [&](const char* name) {
         std::filesystem::create_directory(disks.Path() / name);
         return ask("Add", R"({"limitDays": 1.5, "path": ")" + (disks.Path() / name).string() + "\"}");
@@ -57,6 +58,11 @@ TEST(MountApi, ADiskIsAddedToldOfLimitedAndRemoved) {
     EXPECT_EQ(ask("Set", seen + R"(, "limitDays": 0})").status, 400);
     EXPECT_EQ(ask("Set", seen + R"(, "limitBytes": "1T"})").status, 400);
     EXPECT_EQ(ask("Remove", seen + "}").status, 409) << "it holds footage";
+    const Json::Value camera = ask_of("Camera", "List", "{}").Json()["data"]["camera"][0];
+    const std::string lower = R"({"id": 1, "limitDays": 1, "revision": )" + camera["revision"].asString();
+    EXPECT_EQ(ask_of("Camera", "Set", lower + "}").Json()["data"]["confirm"], refused.Json()["data"]["confirm"]);
+    const Answer confirmed = ask_of("Camera", "Set", lower + R"(, "confirm": true})");
+    EXPECT_EQ(confirmed.Json()["data"]["camera"]["limitDays"], 1.0) << confirmed.body;
     EXPECT_EQ(ask("Set", seen + R"(, "limitDays": 1, "confirm": true})").status, 200);
     EXPECT_EQ(ask("Set", seen + "}").Json()["error"]["data"]["limit"]["days"].asDouble(), 1);
     EXPECT_EQ(ask("Remove", R"({"id": 2, "revision": )" + mount["revision"].asString() + "}").status, 200);
