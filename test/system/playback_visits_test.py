@@ -101,6 +101,25 @@ class PlaybackVisitsTest(DemoFootageTest):
                 self.assertLessEqual(dragged["asked"], dragged["moves"])
                 self.assertGreater(dragged["pictures"], 0)
 
+    def test_a_visit_outlives_an_outage_on_each_screen_and_a_link_leads_to_its_picture(self):
+        address = f"#event={self.event['id']}&layout=1&filter=1&kinds=alarm,pos"
+        with Visit("outage.mjs", self.address, TZ="UTC", PLAYING=address) as visit:
+            visit.see("all shown")
+            self.server.stop()
+            visit.see("all told")
+            self.server.start()
+            back = visit.see("all back")
+            self.assertGreaterEqual(back["resumed"], back["lost"])
+            self.assertLess(back["resumed"] - back["lost"], 4 * 25, "it goes on where it was")
+            linked = visit.see("linked")
+            for part in address[1:].split("&"):
+                self.assertIn(part, linked["hash"])
+            self.assertEqual(self.reader.read([base64.b64decode(linked["picture"])]), [linked["frame"] - 1])
+            for step in ("opened", "reloaded", "back"):
+                seen = visit.see(step)
+                self.assertEqual(seen["caption"], linked["caption"], step)
+                self.assertEqual(self.reader.read([base64.b64decode(seen["picture"])]), [linked["frame"] - 1], step)
+
 
 if __name__ == "__main__":
     unittest.main()

@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// One visit to all screens at once, in a tab each, while the server goes away and comes back: what is shown says so, and
+// goes on by itself. Then a link to what was played, from one tab to another. PLAYING is the address of a recording.
+import { address, folder, logIn, report, visit } from "./visit.mjs";
+
+const playing = process.env.PLAYING;
+
+await visit(async (first) => {
+  const tabs = {};
+  const open = async (name, hash, content) => {
+    const page = name === "wall" ? first : await first.context().newPage();
+    await page.goto(address + hash);
+    if (name === "wall") await logIn(page);
+    await page.locator(content).first().waitFor({ timeout: 20_000 });
+    tabs[name] = page;
+  };
+  const frame = (page) => page.evaluate(() => Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)?.[1]));
+
+  await open("wall", "", '.tile[data-camera="1"][data-state="live"]');
+  await open("large", "#camera=1", '.large[data-state="live"]');
+  // Where they go while the server is away, and what they show once it is back.
+  const goes = {
+    events: ["#events", ".row"],
+    map: ["#map=1", ".map-item"],
+    settings: ["#settings=accounts", ".record-row"],
+  };
+  for (const name of Object.keys(goes)) await open(name, "#settings=groups", ".record-row");
+  await open("playing", playing, '.stage-picture[data-state="playing"]');
+  await report("all shown");
+
+  await tabs.playing.getByText("The connection was lost. Playback continues").first().waitFor({ timeout: 20_000 });
+  const lost = await frame(tabs.playing);
+  for (const [name, shown] of [["wall", '.tile[data-camera="1"]'], ["large", ".large"]]) {
+    await tabs[name].bringToFront();
+    await tabs[name].locator(`${shown}:not([data-state="live"])`).first().waitFor({ timeout: 20_000 });
+  }
+  for (const [name, [hash]] of Object.entries(goes)) {
+    await tabs[name].bringToFront();
+    await tabs[name].evaluate((to) => void (location.hash = to), hash);
+    await tabs[name].getByText("does not answer").first().waitFor({ timeout: 20_000 });
+  }
+  await tabs.playing.bringToFront();
+  await report("all told");
+
+  await tabs.playing.locator('.stage-picture[data-state="playing"]').waitFor({ timeout: 30_000 });
+  await tabs.playing.keyboard.press(" ");
+  await tabs.playing.locator('.stage-picture[data-state="paused"]').waitFor({ timeout: 20_000 });
+  const resumed = await frame(tabs.playing);
+  await tabs.wall.bringToFront();
+  await tabs.wall.locator('.tile[data-camera="1"][data-state="live"]').waitFor({ timeout: 30_000 });
+  await tabs.large.bringToFront();
+  await tabs.large.locator('.large[data-state="live"]').waitFor({ timeout: 30_000 });
+  for (const [name, [, content]] of Object.entries(goes)) {
+    await tabs[name].bringToFront();
+    await tabs[name].locator(content).first().waitFor({ timeout: 30_000 });
+    await tabs[name].screenshot({ path: `${folder}/back-${name}.png` });
+  }
+  await report("all back", { lost, resumed });
+
+  /** What is shown, without what differs between a moment and the next. */
+  const shown = (page) =>
+    page.evaluate(() => ({
+      picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
+      caption: document.querySelector(".stage-time").textContent,
+      found: document.querySelector(".list-head").textContent,
+    }));
+  const paused = (page) => page.locator('.stage-picture.has-picture[data-state="paused"]').waitFor({ timeout: 20_000 });
+  const same = async (page, step) => {
+    await page.bringToFront();
+    await paused(page);
+    await page.waitForFunction((caption) => document.querySelector(".stage-time").textContent === caption, link.caption);
+    await report(step, await shown(page));
+  };
+  await tabs.playing.bringToFront();
+  const link = { hash: await tabs.playing.evaluate(() => location.hash), ...(await shown(tabs.playing)) };
+  await report("linked", { ...link, frame: await frame(tabs.playing) });
+  await tabs.events.goto("about:blank");
+  await tabs.events.goto(address + link.hash);
+  await same(tabs.events, "opened");
+  await tabs.events.reload();
+  await same(tabs.events, "reloaded");
+  await tabs.events.evaluate(() => void (location.hash = "#maps"));
+  await tabs.events.locator(".map-item").first().waitFor({ timeout: 20_000 });
+  await tabs.events.goBack();
+  await same(tabs.events, "back");
+});
