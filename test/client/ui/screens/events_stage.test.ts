@@ -3,6 +3,7 @@
 // The events' screen in a real browser: several cameras of one moment, the playhead that is dragged, and links to what
 // is seen.
 
+import { Fingers } from "../../support/fingers";
 import { hasBrowser, isFirefox } from "../../support/served_client";
 import { captions, hashOf, noFocus, ServedEvents, state } from "../../support/served_events";
 
@@ -65,20 +66,23 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     client.server.cameras.pop();
   }, 40_000);
 
-  test.each(["mouse", "keys"] as const)("the playhead that is dragged with %s shows stills, and plays where it is let go", async (how) => {
+  test.each(isFirefox ? (["mouse", "keys"] as const) : (["mouse", "keys", "finger"] as const))("the playhead that is dragged with %s shows stills, and plays where it is let go", async (how) => {
     const page = await events.open("#event=14", 1440, 900);
     await state(page, "playing");
     archive.stills.length = 0;
     const before = (await captions(page))[0]!;
     const { x, y, width } = (await page.locator(".timeline-axis").boundingBox())!;
-    if (how === "mouse") {
+    const fingers = how === "finger" && (await Fingers.of(page));
+    if (how !== "keys") {
       // The recording is an eighth of the width from the left, and there are forty minutes more.
-      await page.mouse.move(x + width * 0.13, y + 10);
-      await page.mouse.down();
+      const press = { x: x + width * 0.13, y: y + 10 };
+      await page.mouse.move(press.x, press.y);
+      await (fingers ? fingers.send("touchStart", [press]) : page.mouse.down());
+      const move = (to: number) => (fingers ? fingers.send("touchMove", [{ ...press, x: to }]) : page.mouse.move(to, press.y));
       const seen = new Set<string>();
       // The pointer does not rest before several have come.
       for (let step = 0; seen.size < 5; step += 1) {
-        await page.mouse.move(x + width * 0.13 + (step % 60), y + 10);
+        await move(press.x + (step % 60));
         seen.add((await captions(page))[0]!);
       }
     } else {
@@ -99,7 +103,8 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
       expect(Math.abs(secondOf(caption!) - ((playhead - noon + 3_600) % 3_600))).toBeLessThan(1);
       return playhead;
     }, 10_000);
-    await (how === "mouse" ? page.mouse.up() : page.keyboard.up("ArrowRight"));
+    if (fingers) await fingers.send("touchEnd", []);
+    else await (how === "mouse" ? page.mouse.up() : page.keyboard.up("ArrowRight"));
     await state(page, "playing");
     const [, id, frame] = /^event(\d+) frame (\d+) /.exec(archive.asked.at(-1)!)!;
     expect(Math.abs(noon + (Number(id) - 10) * 300 + Number(frame) / 10 - shown)).toBeLessThan(1.5);
@@ -147,6 +152,18 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await vi.waitFor(async () => expect(await seen()).toEqual(second));
     await page.reload();
     await vi.waitFor(async () => expect(await seen()).toEqual(second), 10_000);
+  }, 40_000);
+
+  test.skipIf(isFirefox)("two fingers enlarge a recorded picture and a live one", async () => {
+    const page = await events.open("#event=14", 1440, 900);
+    for (const [hash, shown] of [["#event=14", ".stage-picture[data-state=playing]"], ["#camera=1", ".large[data-state=live]"]] as const) {
+      await page.evaluate((to) => void (location.hash = to), hash);
+      const canvas = page.locator(`${shown} canvas`);
+      await canvas.waitFor();
+      const { width } = (await canvas.boundingBox())!;
+      await (await Fingers.of(page)).spread(page, `${shown} canvas`);
+      await vi.waitFor(async () => expect((await canvas.boundingBox())!.width / width).toBeGreaterThan(2.5));
+    }
   }, 40_000);
 
   test("the same moment on all cameras, from a card of the list and from the player", async () => {
