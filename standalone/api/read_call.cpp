@@ -38,7 +38,9 @@ Call ReadCall(const base::Installation& installation, const http::RequestCounter
     // The session comes first: nobody without one may cost more than a short request.
     call.token = FindAccessToken(call);
     if (call.token) {
-        base::SetLogAccount(call.token->AsReporter().name);
+        const std::string reporter = call.token->AsReporter().name;
+        base::SetLogAccount(reporter);
+        control::SlotTable::SetAccount(slot, reporter);
     } else {
         call.login = FindLogin(call);
     }

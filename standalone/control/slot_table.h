@@ -89,7 +89,7 @@ struct alignas(kSlotBytes) Slot {
     std::array<char, 64> session;
     std::atomic<bool> has_call;
     std::array<char, 64> call;
-    std::array<char, 65> account;  // of its session
+    std::array<char, 71> account;  // of its session, or its access token
     std::atomic<int> status;       // of the answer, once it is known
     Player player;
     std::atomic<std::int64_t> forwarded_player_key;  // of the player whose stream it forwards; 0: none
@@ -126,7 +126,7 @@ class SlotTable {
 
     // For a request process: what it serves, "VEXO.Event/List", for those who count; only the first 63 bytes are kept.
     static void SetCall(Slot& slot, std::string_view call);
-    // For a request process: whose it is; only the first 64 bytes are kept, and no account has more.
+    // For a request process: whose it is; only the first 70 bytes are kept, and neither an account nor a token has more.
     static void SetAccount(Slot& slot, std::string_view account);
     // Visits the slots of running requests. They may end, or change, at any time.
     void VisitRunning(const std::function<void(const Slot&)>& visit) const;

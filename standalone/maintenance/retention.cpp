@@ -58,6 +58,12 @@ void TakeOldest(NextPage next_page, Judge judge, Take take) {
     }
 }
 
+// Whether what lies there, and not the disk, keeps a file from being removed.
+bool IsOfFile(const std::error_code& why) {
+    return why == std::errc::permission_denied || why == std::errc::operation_not_permitted ||
+           why == std::errc::is_a_directory || why == std::errc::too_many_symbolic_link_levels;
+}
+
 // TakeOldest of a mount's events of a camera, by its age limit.
 template <typename Take>
 void TakeExpired(store::Events& events, int mount_id, int camera_id, std::int64_t max_age_s, std::int64_t now_s,
@@ -125,13 +131,17 @@ class Retention {
         return {space.free_bytes + content.size_bytes, space.free_files + kFilesOfEvent * content.events};
     }
 
-    // A folder that fails is one camera's: all others keep to their ages, and the mount to its limits.
+    // A file that cannot be removed is one camera's: all others keep to their ages, and the mount to its limits. A disk
+    // that fails ends the run.
     void DeleteExpiredOfCameras() {
         for (const auto& [camera, max_age_s] : cameras_.MaxAges()) {
             try {
                 TakeExpired(events_, mount_.id, camera, max_age_s, now_s_,
                             [this](std::span<const store::Event> events) { deletion_.Delete(events); });
-            } catch (const std::system_error&) {
+            } catch (const std::system_error& error) {
+                if (!IsOfFile(error.code())) {
+                    throw;
+                }
                 failure_ = std::current_exception();
             }
         }

@@ -82,9 +82,6 @@ void CameraLeaseKeeper::Work(store::Store& store) {
     store::CameraLeases leases(store);
     const std::vector<store::CameraLease> cameras = leases.List();
     NoteHolders(cameras);
-    if (const auto changed = ChangedRates(cameras); !changed.empty()) {
-        leases.SetRates(own_, changed);
-    }
     const Assignment assignment = Assign(own_, watched, cameras);
     std::set<int> held;
     for (const store::CameraLease& camera : cameras) {
@@ -109,6 +106,10 @@ void CameraLeaseKeeper::Work(store::Store& store) {
     }
     Publish(std::move(held));
     Report(watched, cameras);
+    // Last, since whether it can be stored decides nothing now.
+    if (const auto changed = ChangedRates(cameras); !changed.empty()) {
+        leases.SetRates(own_, changed);
+    }
 }
 
 std::vector<AssignedHost> CameraLeaseKeeper::Observe(const std::vector<store::Host>& all) {
