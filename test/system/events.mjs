@@ -139,6 +139,8 @@ await visit(async (page, complaints) => {
   }
   await page.locator(".export-about", { hasText: "2 files in a ZIP" }).waitFor();
   await page.screenshot({ path: `${folder}/export.png` });
+  // Else a dialog of the browser asks where to save it.
+  await page.evaluate(() => Object.assign(window, { showSaveFilePicker: undefined }));
   const file = await download(page, () => page.locator(".export-panel a").click(), folder);
   await report("exported", { file, complaints });
 });

@@ -7,6 +7,8 @@ import { address, type Server } from "./server";
 
 /** What an export will be. */
 export interface ExportPlan {
+  /** Of the file. */
+  name: string;
   sizeBytes: number;
   files: number;
   /** How much is missing of the cameras that were not recorded all the time. */
@@ -14,6 +16,7 @@ export interface ExportPlan {
 }
 
 interface RawPlan {
+  name: string;
   size_bytes: number;
   camera: { name: string; file: unknown[]; gap: { begin: { utc: string }; end: { utc: string } }[] }[];
 }
@@ -29,14 +32,13 @@ export class Exports {
 
   /** Rejects with status 404 where nothing of it is recorded. */
   async plan(cameras: readonly number[], fromS: number, toS: number): Promise<ExportPlan> {
-    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
-    const { size_bytes, camera } = await this.#server.call<RawPlan>(kApi, "PlanExport", asked);
-    const missing = camera.map(({ name, gap }) => ({
-      camera: name,
+    const { name, size_bytes, camera } = await this.#server.call<RawPlan>(kApi, "PlanExport", asked(cameras, fromS, toS));
+    const missing = camera.map(({ name: camera, gap }) => ({
+      camera,
       seconds: gap.reduce((sum, { begin, end }) => sum + (Date.parse(end.utc) - Date.parse(begin.utc)) / 1000, 0),
     }));
     const files = camera.reduce((sum, { file }) => sum + file.length, 0);
-    return { sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
+    return { name, sizeBytes: size_bytes, files, missing: missing.filter(({ seconds }) => seconds > 0) };
   }
 
   /** The cameras whose recordings the caller may play, but not take away. */
@@ -47,8 +49,12 @@ export class Exports {
   }
 
   address(cameras: readonly number[], fromS: number, toS: number): string {
-    const asked = { cameralists: cameras.join(), from: String(fromS), to: String(toS) };
-    return address(kApi, "Export", { ...asked, ...zoneAt(fromS) });
+    return address(kApi, "Export", asked(cameras, fromS, toS));
+  }
+
+  /** The file as it comes; `signal` cancels it. Rejects with the server's refusal. */
+  async open(cameras: readonly number[], fromS: number, toS: number, signal: AbortSignal): Promise<Response> {
+    return this.#server.media(kApi, "Export", asked(cameras, fromS, toS), { signal });
   }
 
   /** Keeps the recordings of the footage, or gives them back to retention. For managers. */
@@ -56,6 +62,10 @@ export class Exports {
     const form = { event: String(id), ...kindParameter(kind), keep: String(isKept), note };
     await this.#server.call<unknown>(kApi, "Keep", {}, { form });
   }
+}
+
+function asked(cameras: readonly number[], fromS: number, toS: number): Record<string, string> {
+  return { cameralists: cameras.join(), from: String(fromS), to: String(toS), ...zoneAt(fromS) };
 }
 
 /** The file is named after its start in this browser's time zone. */

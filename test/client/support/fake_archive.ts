@@ -48,6 +48,8 @@ export class FakeArchive {
   playersPerSession = 1;
   /** Cameras whose recordings the account may play, but not take away. */
   notExported: number[] = [];
+  /** The next answer to an export; null for a small file. */
+  exported: Response | null = null;
   /** The server does not answer. */
   isAway = false;
   framesPerSecond = 100;
@@ -103,10 +105,10 @@ export class FakeArchive {
           const isWhole = found.some(({ stop }) => stop >= to);
           return { name: `Camera ${id}`, file: found.slice(0, 1), gap: isWhole ? [] : [{ begin: utc(to - 12), end: utc(to) }] };
         });
-        return camera.every(({ file }) => file.length === 0) ? json(null, 404) : json({ size_bytes: (to - from) * 1e6, camera });
+        return camera.every(({ file }) => file.length === 0) ? json(null, 404) : json({ name: "export.zip", size_bytes: (to - from) * 1e6, camera });
       }
       case "VEXO.Event Export":
-        return new Response("file", { headers: { "Content-Disposition": 'attachment; filename="export.zip"' } });
+        return this.exported ?? new Response("file", { headers: { "Content-Disposition": 'attachment; filename="export.zip"' } });
       case "VEXO.Event Next":
         return json({ event: this.#next(query) });
       case "VEXO.Event Frame": {

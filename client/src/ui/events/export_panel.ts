@@ -12,6 +12,7 @@ import { iconButton } from "../widgets/button";
 import { element, setText } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 import { calendarDate, clockTime, spanInWords } from "../widgets/text";
+import { ExportRun, type OfferedExport } from "./export_run";
 
 const kDenied = "You may play the recordings of this camera, but not export them";
 const kDebounceMs = 300;
@@ -30,6 +31,9 @@ export class ExportPanel {
   readonly #cameraRow = element("div", { class: "chips", role: "group", "aria-label": "Cameras to export" });
   readonly #about = element("p", { class: "export-about", role: "status" });
   readonly #start = element("a", { class: "button primary" }, icon("download"), "Export");
+  readonly #run = new ExportRun(() => this.#showRunning());
+  /** What the link exports. */
+  #offered: OfferedExport | null = null;
   #span: Span = { fromMs: 0, toMs: 0 };
   #footage: Footage | null = null;
   #chosen = new Set<number>();
@@ -45,14 +49,26 @@ export class ExportPanel {
     this.#changed = changed;
     for (const input of [this.#from, this.#to]) input.addEventListener("change", () => this.#readInputs());
     this.#event.addEventListener("click", () => this.#footage && this.setSpan(spanOf(this.#footage), true));
+    this.#start.addEventListener("click", (event) => {
+      if (this.#offered && this.#run.begin(this.#offered)) event.preventDefault();
+    });
     const close = iconButton("close", "Close export", () => this.close());
     const times = element("div", { class: "export-times" }, this.#from, "–", this.#to, this.#event);
     const end = element("div", { class: "export-end" }, this.#about, this.#start, close);
-    this.root.append(times, this.#cameraRow, end);
+    this.root.append(times, this.#cameraRow, end, this.#run.root);
   }
 
   get isOpen(): boolean {
     return !this.root.hidden;
+  }
+
+  /** It goes on while the panel is closed. */
+  get isRunning(): boolean {
+    return this.#run.isRunning;
+  }
+
+  cancel(): void {
+    this.#run.cancel();
   }
 
   /** `footage` is what plays, where something does. */
@@ -105,8 +121,15 @@ export class ExportPanel {
     this.#tell("The end must come after the beginning.");
   }
 
+  /** One at a time. */
+  #showRunning(): void {
+    this.#start.hidden = this.isRunning;
+    if (!this.isRunning && document.activeElement === document.body) this.#start.focus();
+  }
+
   /** What is said while nothing can be exported. */
   #tell(text: string): void {
+    this.#offered = null;
     this.#start.removeAttribute("href");
     this.#start.setAttribute("aria-disabled", "true");
     setText(this.#about, text);
@@ -132,6 +155,7 @@ export class ExportPanel {
       setText(this.#about, aboutText(plan, toS - fromS));
       this.#start.removeAttribute("aria-disabled");
       this.#start.href = this.#exports.address(cameras, fromS, toS);
+      this.#offered = { ...plan, open: (signal) => this.#exports.open(cameras, fromS, toS, signal) };
     } catch (error) {
       if (isStale()) return;
       const isNothing = error instanceof ServerError && error.status === 404;

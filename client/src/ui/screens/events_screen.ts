@@ -128,8 +128,14 @@ export class EventsScreen extends Screen {
     this.#scrubbing.close();
     this.#playback.close();
     this.#export.close();
+    this.#export.cancel();
     this.#snapshots.root.close();
     this.#overview.close();
+  }
+
+  /** Asks first where an export would end. */
+  override canLeave(): boolean {
+    return !this.#export.isRunning || confirm("Leave, and cancel the export that runs?");
   }
 
   followRoute(): boolean {

@@ -165,12 +165,61 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await about("4 min · about 240 MB");
     await page.locator(".export-panel .chip", { hasText: "Parking" }).click();
     await about("2 files in a ZIP");
+    await page.evaluate(() => Object.assign(window, { showSaveFilePicker: undefined }));
     const [download] = await Promise.all([page.waitForEvent("download"), page.click(".export-panel a")]);
     const asked = new URL(download.url()).searchParams;
     const span = [asked.get("cameralists"), Number(asked.get("from")), Number(asked.get("to"))];
     expect(span).toEqual(["1,2", noon + 3300, noon + 3540]);
+    await page.locator(".export-run", { hasText: "list of downloads" }).waitFor();
     await page.keyboard.press("Escape");
     await end.waitFor({ state: "hidden" });
+  }, 40_000);
+
+  test.each([
+    ["whole", "Exported export.zip, 3.0 MB.", "closed 3000000"],
+    ["cut", "The export broke off", "aborted removed"],
+    ["cancelled", "The export of export.zip was cancelled.", "aborted removed"],
+    ["refused", "Nothing was exported. The server is busy.", "aborted removed"],
+  ])("an export into a chosen file that is %s", async (how, said, file) => {
+    let [body, isLeft]: [ReadableStreamDefaultController | null, boolean] = [null, false];
+    const stream = new ReadableStream({ start: (made) => void (body = made), cancel: () => void (isLeft = true) });
+    const headers = { "Content-Type": "application/zip", "Content-Length": "3000000" };
+    archive.exported = how === "refused" ? Response.json({ success: false }, { status: 503 }) : new Response(stream, { headers });
+    const send = (bytes: number) => body!.enqueue(new Uint8Array(bytes));
+    const page = await events.open("#event=11", 1440, 900);
+    await state(page, "playing");
+    await page.evaluate(() => {
+      const log = (text: string) => void (document.body.dataset.file = `${document.body.dataset.file ?? ""} ${text}`.trim());
+      let size = 0;
+      const write = (chunk: Uint8Array) => void (size += chunk.length);
+      const createWritable = async () => new WritableStream({ write, close: () => log(`closed ${size}`), abort: () => log("aborted") });
+      const chosen = { createWritable, getFile: async () => ({ size: 0 }), remove: async () => log("removed") };
+      const pick = async ({ suggestedName }: { suggestedName: string }) => ({ ...chosen, name: suggestedName });
+      Object.assign(window, { showSaveFilePicker: pick });
+    });
+    await noFocus(page);
+    await page.keyboard.press("x");
+    await page.click(".export-panel a[href]");
+    const run = (text: string) => page.locator(".export-run", { hasText: text }).waitFor();
+    if (how !== "refused") {
+      await run("0 B of about 300 MB");
+      send(1_000_000);
+      await run("1.0 MB of 3.0 MB");
+      page.once("dialog", (asked) => void asked.dismiss());
+      await page.getByRole("link", { name: "Live", exact: true }).click();
+      send(1_000_000);
+      await run("2.0 MB of 3.0 MB");
+    }
+    if (how === "whole") send(1_000_000), body!.close();
+    if (how === "cut") body!.error(new Error("cut"));
+    if (how === "cancelled") {
+      await page.click("button:text-is('Cancel')");
+      await vi.waitFor(() => expect(isLeft).toBe(true));
+    }
+    await run(said);
+    expect(await page.getAttribute("body", "data-file")).toBe(file);
+    expect(await page.locator(".export-panel a").isVisible()).toBe(true);
+    archive.exported = null;
   }, 40_000);
 
   test("of a camera that may not be exported, recordings play, and neither download nor export is offered", async () => {
