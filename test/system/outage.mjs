@@ -23,7 +23,11 @@ await visit(async (first) => {
   const goes = {
     events: ["#events", ".row"],
     map: ["#map=1", ".map-item"],
-    settings: ["#settings=accounts", ".record-row"],
+    cameras: ["#settings=cameras", ".camera-row"],
+    accounts: ["#settings=accounts", ".record-row"],
+    storage: ["#settings=storage", ".record-card"],
+    system: ["#settings=system", ".health-summary"],
+    audit: ["#settings=audit", ".audit-entry, .settings-state"],
   };
   for (const name of Object.keys(goes)) await open(name, "#settings=groups", ".record-row");
   await open("playing", playing, '.stage-picture[data-state="playing"]');
@@ -43,9 +47,9 @@ await visit(async (first) => {
   await tabs.playing.bringToFront();
   await report("all told");
 
-  await tabs.playing.locator('.stage-picture[data-state="playing"]').waitFor({ timeout: 30_000 });
+  await tabs.playing.locator('.stage-picture[data-state="playing"]').first().waitFor({ timeout: 30_000 });
   await tabs.playing.keyboard.press(" ");
-  await tabs.playing.locator('.stage-picture[data-state="paused"]').waitFor({ timeout: 20_000 });
+  await tabs.playing.locator('.stage-picture[data-state="paused"]').first().waitFor({ timeout: 20_000 });
   const resumed = await frame(tabs.playing);
   await tabs.wall.bringToFront();
   await tabs.wall.locator('.tile[data-camera="1"][data-state="live"]').waitFor({ timeout: 30_000 });
@@ -58,14 +62,15 @@ await visit(async (first) => {
   }
   await report("all back", { lost, resumed });
 
-  /** What is shown, without what differs between a moment and the next. */
   const shown = (page) =>
     page.evaluate(() => ({
       picture: document.querySelector(".stage-picture canvas").toDataURL("image/jpeg", 0.95).split(",")[1],
       caption: document.querySelector(".stage-time").textContent,
-      found: document.querySelector(".list-head").textContent,
+      hash: location.hash,
+      cells: document.querySelectorAll(".stage > *").length,
+      kinds: [...document.querySelectorAll(".chips input")].map(({ checked }) => checked),
     }));
-  const paused = (page) => page.locator('.stage-picture.has-picture[data-state="paused"]').waitFor({ timeout: 20_000 });
+  const paused = (page) => page.locator('.stage-picture.has-picture[data-state="paused"]').first().waitFor({ timeout: 20_000 });
   const same = async (page, step) => {
     await page.bringToFront();
     await paused(page);
@@ -73,7 +78,7 @@ await visit(async (first) => {
     await report(step, await shown(page));
   };
   await tabs.playing.bringToFront();
-  const link = { hash: await tabs.playing.evaluate(() => location.hash), ...(await shown(tabs.playing)) };
+  const link = await shown(tabs.playing);
   await report("linked", { ...link, frame: await frame(tabs.playing) });
   await tabs.events.goto("about:blank");
   await tabs.events.goto(address + link.hash);
@@ -84,4 +89,7 @@ await visit(async (first) => {
   await tabs.events.locator(".map-item").first().waitFor({ timeout: 20_000 });
   await tabs.events.goBack();
   await same(tabs.events, "back");
+  await tabs.events.goForward();
+  await tabs.events.locator(".map-item").first().waitFor({ timeout: 20_000 });
+  await report("forward");
 });

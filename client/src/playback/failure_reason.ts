@@ -15,6 +15,11 @@ export function isPassing({ status }: ServerError): boolean {
   return kPassing.includes(status);
 }
 
+/** Whether nobody has answered, rather than the server for itself. */
+export function isAway({ status }: ServerError): boolean {
+  return status === 0 || status === 502;
+}
+
 /** Tells a recording that retention has deleted from one that cannot be played. */
 export async function reasonOf(error: ServerError, footage: Footage, recordings: Recordings): Promise<string> {
   if (error.status !== kShowsWarning && error.status !== kNotFound) return error.message;

@@ -17,7 +17,7 @@ import { streamEnd } from "./stream_end";
 
 const kTailDelayMs = 1_000;
 /** Between attempts to get a lost stream back. */
-const kRetryMs = 1_000;
+export const kRetryMs = 1_000;
 /**
  * After this many lost streams in a row that showed nothing new, the recording counts as ended, even if its file claims
  * more.

@@ -7,14 +7,15 @@
 //               playhead asks for more frames than can be fetched: then only the last is.
 
 import type { AudioPlayer } from "../live/audio_player";
+import { delay } from "../wire/delay";
 import { isSameFootage, type Footage } from "../wire/footage";
 import type { Recordings } from "../wire/recordings";
 import { asServerError } from "../wire/server";
-import { reasonOf } from "./failure_reason";
+import { isAway, reasonOf } from "./failure_reason";
 import { FootageStream } from "./footage_stream";
 import type { RecordedFrame } from "./frame_stream";
 import { OpenFootage } from "./open_footage";
-import { Playback, type PlaybackSink } from "./playback";
+import { kRetryMs, Playback, type PlaybackSink } from "./playback";
 import type { PlayerState } from "./player_state";
 import { ShownFrame } from "./shown_frame";
 import { startAt, startOfStep, type Start } from "./start";
@@ -189,15 +190,20 @@ export class Player {
     this.#shown.begin("atMs" in start ? start.atMs : dueFromMs);
     opened.stills.forget();
     this.#become({ kind: "opening" });
-    try {
-      const first = await opened.locate(start);
-      if (signal.aborted) return;
-      this.#opening = first;
-      this.#playback = new Playback(this.#recordings, this.#streams, opened, this.#rate, this.#sink(signal));
-      const end = await this.#playback.run(first.index, signal);
-      if (end) this.#become({ kind: end });
-    } catch (error) {
-      await this.#fail(error, signal);
+    while (!signal.aborted) {
+      try {
+        const first = await opened.locate(start);
+        if (signal.aborted) return;
+        this.#opening = first;
+        this.#playback = new Playback(this.#recordings, this.#streams, opened, this.#rate, this.#sink(signal));
+        const end = await this.#playback.run(first.index, signal);
+        if (end) this.#become({ kind: end });
+        return;
+      } catch (error) {
+        if (!isAway(asServerError(error))) return this.#fail(error, signal);
+        if (!signal.aborted) this.#sink(signal).lost();
+        await delay(kRetryMs, signal);
+      }
     }
   }
 

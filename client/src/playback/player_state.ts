@@ -9,8 +9,8 @@ export type PlayerState =
   /** The server ended the stream before its end: another player of this session has taken over. */
   | { kind: "preempted" }
   /**
-   * The connection was lost while playing; it is tried again until it is back, and playback continues at the frame on
-   * the screen.
+   * The connection was lost, or there is none yet; it is tried again until it is back, and playback continues at the
+   * frame on the screen, if there is one.
    */
   | { kind: "lost" }
   | { kind: "failed"; reason: string };

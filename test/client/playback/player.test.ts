@@ -136,6 +136,14 @@ describe("a player", () => {
     archive.isAway = false;
   }, 30_000);
 
+  test("what is opened while the server is away is played when it is back", async () => {
+    archive.isAway = true;
+    player.open(footage(7), 1_002_000, true);
+    await until("lost");
+    archive.isAway = false;
+    await untilFrame(20);
+  });
+
   test("the rate changes within the stream; where the server refuses, another is opened at the frame shown", async () => {
     player.open(footage(7), 0, true);
     await untilFrame(2);
