@@ -12,21 +12,19 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr const char* kSecretName = "access token";
 constexpr const char* kWrong = "wrong access token";  // packaging/fail2ban knows the sentence
 // What was given out is no guess: fail2ban bans nobody for it.
+constexpr const char* kRemoved = "removed access token";
 constexpr const char* kExpired = "expired access token";
 
 // Logs five of a network within a minute, for they cost no more than a request: beyond that CountAttempt throws.
-[[noreturn]] void Refuse(const Call& call, const std::optional<store::AccessToken>& expired) {
-    const char* sentence = expired ? kExpired : kWrong;
+[[noreturn]] void Refuse(const Call& call, const char* sentence, const std::string& who = "access token") {
     try {
-        CountAttempt(call, expired ? kExpired : kSecretName);
+        CountAttempt(call, sentence);
     } catch (const store::StoreError& error) {  // a store that can only be read refuses as well
         base::LogWarning(std::string("cannot count a wrong access token: ") + error.what());
     }
-    LogRefused(call.context.Installation(), expired ? expired->AsReporter().name : kSecretName,
-               call.request.Header("REMOTE_ADDR"), sentence);
+    LogRefused(call.context.Installation(), who, call.request.Header("REMOTE_ADDR"), sentence);
     throw Failure(401, sentence);
 }
 
@@ -50,8 +48,11 @@ std::optional<store::AccessToken> FindAccessToken(const Call& call) {
     store::AccessTokens tokens(call.Records());
     std::optional<store::AccessToken> token = tokens.FindBySecret(*bearer);
     const std::int64_t now_s = base::WallSeconds();
-    if (!token || token->IsExpired(now_s)) {
-        Refuse(call, token);
+    if (!token) {
+        Refuse(call, tokens.WasGiven(*bearer) ? kRemoved : kWrong);
+    }
+    if (token->IsExpired(now_s)) {
+        Refuse(call, kExpired, token->AsReporter().name);
     }
     try {
         tokens.Touch(*token, now_s);

@@ -34,7 +34,7 @@ std::string NetworkOf(std::string_view address) {
 void RefuseUnlessNow(int wait_s, const std::string& secret) {
     if (wait_s > 0) {
         const std::string when = "try again in " + std::to_string(wait_s) + " seconds";
-        const std::string article = secret.starts_with('a') ? "an " : "a ";
+        const std::string article = secret.find_first_of("ae") == 0 ? "an " : "a ";
         throw Failure(429, "too many attempts with " + article + secret + "; " + when, wait_s);
     }
 }

@@ -17,9 +17,6 @@ namespace lookhaven::doctor {
 namespace {
 
 void AddOffline(const base::Installation& installation, const std::vector<store::Host>& hosts, Findings& findings) {
-    if (control::FindRecorder(installation) != control::RecorderState::kAlive) {
-        return;  // whose report is old; CheckRecorder tells it
-    }
     for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(installation)) {
         const auto host = std::ranges::find(hosts, status.host, &store::Host::id);
         if (host != hosts.end() && status.state == maintenance::HostState::kOffline) {
@@ -79,9 +76,12 @@ Findings CheckHosts(const base::Installation& installation) {
         const std::vector<store::Host> hosts = store::Hosts(store).All();
         const auto own = std::ranges::find(hosts, installation.HostId(), &store::Host::id);
         if (own != hosts.end()) {
-            AddOffline(installation, hosts, findings);
             AddVersions(hosts, *own, findings);
-            AddUnequalLoads(installation, hosts, store, findings);
+            // Otherwise its report is old; CheckRecorder tells that.
+            if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
+                AddOffline(installation, hosts, findings);
+                AddUnequalLoads(installation, hosts, store, findings);
+            }
         } else if (!hosts.empty()) {
             findings.push_back({"this machine is not one of the hosts that share its store, so it records nothing",
                                 "stop the server, run lookhaven host add, and start the server"});

@@ -40,8 +40,9 @@ struct DiskWatch {
 // than the watch allows. Before them, those older than their camera's maximum age. An event is kept while one recorded
 // before it, to the mount or for a camera's age by the camera, is not old enough. The result is empty for a mount that
 // is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says nothing about
-// others: handle each mount by itself, and try again later. The events deleted until then stay deleted, and trouble
-// with one camera's does not keep others'.
+// others: handle each mount by itself, and try again later. The events deleted until then stay deleted. A file of
+// which only the file system's rights or kinds are in the way keeps neither other cameras' ages nor the mount's limits
+// from being enforced; a disk that fails ends the run.
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
                                 DiskWatch& watch);
 

@@ -88,6 +88,10 @@ std::optional<AccessToken> AccessTokens::FindBySecret(std::string_view secret) {
     return found && DigestMatches(found->second, secret) ? Find(found->first) : std::nullopt;
 }
 
+bool AccessTokens::WasGiven(std::string_view secret) {
+    return secret.starts_with(kPrefix) && Sessions::MayBeSecret(secret.substr(kPrefix.size()), Sessions(store_).Key());
+}
+
 std::optional<AccessToken> AccessTokens::Find(int id) {
     std::vector<AccessToken> found =
         connection_.Read([id](soci::session& sql) { return Fetch(sql, "where id = :id", id); });

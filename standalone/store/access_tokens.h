@@ -58,6 +58,8 @@ class AccessTokens {
 
     // The token of the secret, whatever bytes that holds, and expired ones too.
     std::optional<AccessToken> FindBySecret(std::string_view secret);
+    // Whether this store has once given it out; one that is not found then was removed.
+    bool WasGiven(std::string_view secret);
     std::optional<AccessToken> Find(int id);
     std::vector<AccessToken> List();  // by id
 

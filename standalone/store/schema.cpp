@@ -247,17 +247,18 @@ constexpr const char* kAccessTokens[] = {
      " camera_id integer not null references cameras (id) on delete cascade, primary key (token_id, camera_id))"),
 };
 
+// For cameras whose recordings go earlier than others on their mount. The index is first: it takes minutes to make one
+// of a large table, in which others read cameras.
+constexpr const char* kMaxAgesOfCameras[] = {
+    ("create index events_of_camera_by_order on events (camera_id, mount_id, recording_order, id)"
+     " where recording = 0 and archived = 0 and demo = 0"),
+    "alter table cameras add column max_age bigint not null default 0",
+};
+
 // What cameras send and what hosts have to record it with; 0 until that is measured.
 constexpr const char* kLoads[] = {
     "alter table camera_leases add column bytes_per_second bigint not null default 0",
     "alter table hosts add column processors integer not null default 0",
-};
-
-// For cameras whose recordings go earlier than others on their mount.
-constexpr const char* kMaxAgesOfCameras[] = {
-    "alter table cameras add column max_age bigint not null default 0",
-    ("create index events_of_camera_by_order on events (camera_id, mount_id, recording_order, id)"
-     " where recording = 0 and archived = 0 and demo = 0"),
 };
 
 constexpr Migration kMigrations[] = {
@@ -285,8 +286,8 @@ constexpr Migration kMigrations[] = {
      .on_postgresql = kMarkWordsByCameraOnPostgresql,
      .is_addition = true},
     {.purpose = "access tokens", .statements = kAccessTokens, .is_addition = true},
-    {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
     {.purpose = "the maximum age of a camera's recordings", .statements = kMaxAgesOfCameras, .is_addition = true},
+    {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
 };
 
 }  // namespace

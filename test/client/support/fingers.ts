@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Fingers on the page, which playwright has for taps alone; in Chromium.
+// Touch gestures on a page, of which playwright has taps alone. Chromium only.
 
 import type { Page } from "playwright-core";
 

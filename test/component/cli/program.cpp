@@ -131,7 +131,7 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
 }
 
 void CliTest::UndoLastMigration() {
-    Sql({"drop index events_of_camera_by_order", "alter table cameras drop column max_age",
+    Sql({"alter table camera_leases drop column bytes_per_second", "alter table hosts drop column processors",
          "update schema_version set version = version - 1"});
 }
 

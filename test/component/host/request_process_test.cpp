@@ -79,13 +79,13 @@ TEST(Host, LogsRequestsWhileThatIsWanted) {
         control::DebugLogEditor(host.Home()).SetCategory(control::kRequestsCategory, level);
     };
     host.Ask(success, guest);
-    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; })) << "logged by then";
+    ASSERT_TRUE(Eventually(20s, [&] { return host.RequestProcesses() == 0; })) << "logged by then";
     set_level(control::kDebugLevel);
     host.Ask(success, guest);
     host.Ask("api=Test&version=1&method=Crash", guest);
     host.Ask("api=%0aNone&version=1&method=Success", "");
     host.Ask("api=Test&version=1&method=Throw", guest);
-    ASSERT_TRUE(Eventually(2s, [&] { return host.RequestProcesses() == 0; }));
+    ASSERT_TRUE(Eventually(20s, [&] { return host.RequestProcesses() == 0; }));
     set_level(control::kDebugLevel - 1);
     host.Ask(success, guest);
     host.End(SIGTERM);
