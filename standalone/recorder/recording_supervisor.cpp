@@ -273,20 +273,25 @@ bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
 
 store::HostRoom RecordingSupervisor::Room() const {
     using maintenance::MountState;
+    using maintenance::RecordingState;
+    const auto has_camera = [this](RecordingState state) {
+        return std::ranges::any_of(entries_,
+                                   [state](const auto& entry) { return entry.second.worker->State().state == state; });
+    };
+    // Maintenance also fails where one file cannot be deleted. Cameras need not leave a mount that they record to.
+    const bool is_recording = has_camera(RecordingState::kRecording);
     store::HostRoom room = store::HostRoom::kNone;
     for (const auto& [id, mount] : mounts_) {
         const MountState state = mount->Status().state;
         if (state == MountState::kReady) {
             room = store::HostRoom::kFree;
         } else if (room == store::HostRoom::kNone &&
-                   (state == MountState::kSpaceHeld || state == MountState::kKeptFull)) {
+                   (state == MountState::kSpaceHeld || state == MountState::kKeptFull ||
+                    (state == MountState::kFailing && is_recording))) {
             room = store::HostRoom::kFull;
         }
     }
-    const bool is_disk_full = std::ranges::any_of(entries_, [](const auto& entry) {
-        return entry.second.worker->State().state == maintenance::RecordingState::kDiskFull;
-    });
-    return room == store::HostRoom::kFree && is_disk_full ? store::HostRoom::kFull : room;
+    return room == store::HostRoom::kFree && has_camera(RecordingState::kDiskFull) ? store::HostRoom::kFull : room;
 }
 
 // A thread that cannot be started affects that camera or mount alone, and is tried again. Logged once for each
