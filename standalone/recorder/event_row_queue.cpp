@@ -18,6 +18,10 @@ constexpr std::size_t kIdsPerCamera = 4;
 // From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
 // second.
 constexpr std::int64_t kMaxDelayS = 3;
+// A mark that becomes known so long after its end may still have footage in memory, which is recorded then; the two
+// seconds leave the camera's thread time to begin.
+constexpr std::int64_t kMaxLateMarkS = 10;
+constexpr std::int64_t kLateRecordingS = 2;
 
 }  // namespace
 
@@ -88,7 +92,7 @@ bool EventRowQueue::HasStored(int camera, std::int64_t until_s) const {
     return stored != stored_until_s_.end() && stored->second >= until_s;
 }
 
-std::vector<store::Mark> EventRowQueue::PendingMarks() const {
+std::map<int, PendingMark> EventRowQueue::PendingMarks() const {
     const std::lock_guard lock(mutex_);
     return pending_marks_;
 }
@@ -135,9 +139,8 @@ void EventRowQueue::Work(store::Store& store) {
     } else if (HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
         FillReserve(store);
     }
-    std::vector<store::Mark> pending = store::Marks(store).Pending();
+    NotePending(store::Marks(store).Pending());
     const std::lock_guard lock(mutex_);
-    pending_marks_ = std::move(pending);
     if (is_all_stored) {
         stored_until_s_ = std::move(written_until_s);
         stored_s_ = now_s - kMaxDelayS;
@@ -189,6 +192,21 @@ void EventRowQueue::FillReserve(store::Store& store) {
     for (int id = first; id < first + count; ++id) {
         reserve_.push_back(id);
     }
+}
+
+void EventRowQueue::NotePending(std::vector<store::Mark> marks) {
+    const std::int64_t now_s = base::WallSeconds();
+    const std::lock_guard lock(mutex_);
+    std::map<int, PendingMark> pending;
+    for (store::Mark& mark : marks) {
+        const auto known = pending_marks_.find(mark.id);
+        const bool is_late = now_s >= mark.end_s && now_s < mark.end_s + kMaxLateMarkS;
+        const std::int64_t until_s = known != pending_marks_.end() ? known->second.record_until_s
+                                     : is_late                     ? now_s + kLateRecordingS
+                                                                   : mark.end_s;
+        pending.emplace(mark.id, PendingMark{std::move(mark), until_s});
+    }
+    pending_marks_ = std::move(pending);
 }
 
 void EventRowQueue::StoreGrowth(store::Events& events, const std::vector<store::Event>& grown) {

@@ -24,6 +24,13 @@
 
 namespace lookhaven::recorder {
 
+struct PendingMark {
+    store::Mark mark;
+    // Until when its camera is recorded for it (UTC): its end, or a little later where it became known only then. What
+    // the camera sent before is still buffered.
+    std::int64_t record_until_s = 0;
+};
+
 class EventRowQueue {
   public:
     // Starts the thread. recorder: names this recorder to others on the same store. host, times: as in RecorderLeaseKeeper.
@@ -54,8 +61,8 @@ class EventRowQueue {
     // When all rows that had been Put were in the store, in monotonic microseconds; at first when this queue began.
     std::int64_t StoredUs() const { return stored_us_; }
 
-    // The marks whose footage is still to come, as of the last refresh.
-    std::vector<store::Mark> PendingMarks() const;
+    // The marks whose footage is still to come, by id, as of the last refresh.
+    std::map<int, PendingMark> PendingMarks() const;
     // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
     std::optional<int> FirstReservedId() const;
 
@@ -77,13 +84,14 @@ class EventRowQueue {
     void FillReserve(store::Store& store);
     void StoreGrowth(store::Events& events, const std::vector<store::Event>& grown);
     bool StoreRow(store::Events& events, int id);
+    void NotePending(std::vector<store::Mark> marks);
 
     mutable std::mutex mutex_;
     std::map<int, Entry> entries_;
     std::deque<int> reserve_;
     std::optional<int> first_reserved_id_;
     std::size_t wanted_reserve_ = 0;
-    std::vector<store::Mark> pending_marks_;
+    std::map<int, PendingMark> pending_marks_;
     std::map<int, std::int64_t> written_until_s_;  // of the cameras that are recorded
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;

@@ -18,9 +18,8 @@ using maintenance::RecordingState;
 constexpr std::int64_t kFlushUs = 500'000;
 constexpr std::int64_t kMountCheckUs = 1'000'000;
 constexpr std::int64_t kRetryUs = 1'000'000;
-// Until the recorder knows of a mark, or has an id for the event: it asks the store once a second, which may be
-// slow.
-constexpr int kMaxWaitSeconds = 2;
+// Until the recorder knows of a mark, or has an id for the event: it asks the store once a second, which may be slow.
+constexpr int kMaxWaitSeconds = 5;
 // Events that begin for a camera's times alone: so many in a row, and then one in each interval.
 constexpr std::int64_t kMaxCutBurst = 8;
 constexpr std::int64_t kCutIntervalUs = 10'000'000;

@@ -65,11 +65,12 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
     std::map<int, std::int64_t> until_s;
     const std::int64_t now_s = base::WallSeconds();
-    for (const store::Mark& mark : rows_.PendingMarks()) {
+    for (const auto& [id, pending] : rows_.PendingMarks()) {
+        const store::Mark& mark = pending.mark;
         const auto plan = catalog.cameras.find(mark.camera_id);
-        if (plan != catalog.cameras.end() && mark.start_s <= now_s && now_s < mark.end_s &&
+        if (plan != catalog.cameras.end() && mark.start_s <= now_s && now_s < pending.record_until_s &&
             TakesMarkAt(plan->second, mark.moment_s)) {
-            until_s[mark.camera_id] = std::max(until_s[mark.camera_id], mark.end_s);
+            until_s[mark.camera_id] = std::max(until_s[mark.camera_id], pending.record_until_s);
         }
     }
     return until_s;
@@ -264,7 +265,10 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
     if (IsHeldElsewhere(mark.camera_id) && base::WallSeconds() < mark.end_s + kFootageElsewhereS) {
         return false;  // another host may record more of it
     }
-    return (are_mounts_recovered_ || mark.start_s > started_s_) && rows_.HasStored(mark.camera_id, mark.end_s);
+    const std::map<int, PendingMark> pending = rows_.PendingMarks();
+    const auto known = pending.find(mark.id);
+    return known != pending.end() && (are_mounts_recovered_ || mark.start_s > started_s_) &&
+           rows_.HasStored(mark.camera_id, known->second.record_until_s);
 }
 
 bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
