@@ -14,7 +14,7 @@ const kStepPx = 16;
 
 /** Runs in the page, before its own scripts. */
 function observe() {
-  window.seen = { times: [], asked: 0 };
+  window.seen = { times: [], asked: 0, waits: 0 };
   const drawImage = CanvasRenderingContext2D.prototype.drawImage;
   CanvasRenderingContext2D.prototype.drawImage = function (image, ...place) {
     drawImage.call(this, image, ...place);
@@ -22,8 +22,14 @@ function observe() {
   };
   const ask = window.fetch;
   window.fetch = function (input, init) {
-    if (String(input).includes("method=At")) window.seen.asked += 1;
-    return ask.call(this, input, init);
+    const answer = ask.call(this, input, init);
+    if (String(input).includes("method=At")) {
+      window.seen.asked += 1;
+      window.seen.waits += 1;
+      const ended = () => (window.seen.waits -= 1);
+      answer.then(ended, ended);
+    }
+    return answer;
   };
 }
 
@@ -52,6 +58,7 @@ await visit(async (page) => {
 
     await secondAt(middle - kReachPx - kStepPx);
     await page.waitForTimeout(1_000);
+    await page.waitForFunction(() => window.seen.waits === 0);
     await forget();
     let steps = 0;
     for (let px = -kReachPx; px <= kReachPx; px += kStepPx) {

@@ -6,9 +6,9 @@
 //               begun before the next time was asked for is never fetched. The active camera comes first; the others
 //               get theirs when the pointer rests. Pictures that come in another order are dropped, so that they only
 //               go the way of the pointer. A picture is that of a key frame, which stands for every time until the one
-//               it was asked for: within seconds of H.264 nothing more is fetched.
+//               it was asked for: within seconds of H.264 nothing more is fetched. Nor is what is on its way already.
 
-import type { Footage } from "../wire/footage";
+import { isSameFootage, type Footage } from "../wire/footage";
 import type { Recordings, Still } from "../wire/recordings";
 
 const kMaxConcurrent = 3;
@@ -40,7 +40,8 @@ export class ScrubStills {
   readonly #recordings: Recordings;
   readonly #show: ShowStill;
   #wanted: ScrubRequest[] = [];
-  #running = 0;
+  /** What is being fetched, and the number of the last request for it. */
+  #running = new Map<ScrubRequest, number>();
   #asked = 0;
   /** By camera, the number of the request that was answered last, and its answer. */
   readonly #shown = new Map<number, { number: number; still: Still | null }>();
@@ -64,27 +65,35 @@ export class ScrubStills {
     this.#end.abort();
     this.#end = new AbortController();
     this.#wanted = [];
+    this.#running = new Map();
     this.#shown.clear();
     this.#spans = [];
   }
 
   #pump(): void {
-    while (this.#wanted.length > 0 && this.#running < kMaxConcurrent) void this.#fetch(this.#wanted.shift()!);
+    while (this.#wanted.length > 0 && this.#running.size < kMaxConcurrent) void this.#fetch(this.#wanted.shift()!);
   }
 
-  async #fetch({ camera, footage, atMs, widthPx }: ScrubRequest): Promise<void> {
+  async #fetch(request: ScrubRequest): Promise<void> {
+    const { camera, footage, atMs, widthPx } = request;
     const signal = this.#end.signal;
     const number = (this.#asked += 1);
     if (!footage) return this.#deliver(number, camera, null);
     const known = this.#find(footage, atMs, widthPx);
     if (known) return this.#deliver(number, camera, known.still);
-    this.#running += 1;
+    const running = this.#running;
+    const same = [...running.keys()].find(
+      (one) => one.atMs === atMs && one.widthPx >= widthPx && one.footage && isSameFootage(one.footage, footage),
+    );
+    if (same) return void running.set(same, number);
+    running.set(request, number);
     // Where one fails the picture before stays.
     const still = await this.#recordings.still(footage, atMs, widthPx, signal).catch(() => undefined);
-    this.#running -= 1;
+    const last = running.get(request)!;
+    running.delete(request);
     if (!signal.aborted && still) this.#keep({ footage, widthPx, fromMs: Math.min(still.capturedMs, atMs), toMs: atMs, still });
     this.#pump();
-    if (!signal.aborted && still) await this.#deliver(number, camera, still);
+    if (!signal.aborted && still) await this.#deliver(last, camera, still);
   }
 
   async #deliver(number: number, camera: number, still: Still | null): Promise<void> {
@@ -96,7 +105,7 @@ export class ScrubStills {
 
   #find(footage: Footage, atMs: number, widthPx: number): Span | undefined {
     const found = this.#spans.find(
-      (one) => one.footage === footage && one.widthPx >= widthPx && one.fromMs <= atMs && atMs <= one.toMs,
+      (one) => isSameFootage(one.footage, footage) && one.widthPx >= widthPx && one.fromMs <= atMs && atMs <= one.toMs,
     );
     if (found) this.#spans = [found, ...this.#spans.filter((one) => one !== found)];
     return found;
@@ -104,7 +113,7 @@ export class ScrubStills {
 
   /** In place of others of the same picture, which came for earlier or for later times. */
   #keep(span: Span): void {
-    const isSame = (one: Span) => one.footage === span.footage && one.widthPx === span.widthPx && one.fromMs === span.fromMs;
+    const isSame = (one: Span) => isSameFootage(one.footage, span.footage) && one.widthPx === span.widthPx && one.fromMs === span.fromMs;
     const toMs = Math.max(span.toMs, ...this.#spans.filter(isSame).map((one) => one.toMs));
     this.#spans = [{ ...span, toMs }, ...this.#spans.filter((one) => !isSame(one))].slice(0, kKeptSpans);
   }

@@ -72,6 +72,18 @@ describe("the stills of a dragged playhead", () => {
     expect(shown).toEqual([[1, 1000], [1, 2000], [1, 1000]]);
   });
 
+  test("one that is being fetched is not fetched again, and is shown as the newest request for it", async () => {
+    for (const atMs of [1, 2, 1]) request(atMs);
+    await answer(1);
+    await answer(0);
+    expect(asked).toHaveLength(2);
+    expect(shown).toEqual([[1, 2], [1, 1]]);
+    request(5);
+    stills.stop();
+    request(5);
+    expect(asked).toHaveLength(4);
+  });
+
   test("one that fails leaves the picture, and its place to the next; nothing comes after the end", async () => {
     for (const atMs of [1, 2, 3, 4]) request(atMs);
     await asked[0]!.answer(new Error("lost"));
