@@ -54,7 +54,7 @@ export class Exports {
 
   /** The file as it comes; `signal` cancels it. Rejects with the server's refusal. */
   async open(cameras: readonly number[], fromS: number, toS: number, signal: AbortSignal): Promise<Response> {
-    return this.#server.media(kApi, "Export", asked(cameras, fromS, toS), { signal });
+    return this.#server.media(kApi, "Export", asked(cameras, fromS, toS), { signal, noAnswer: "The recordings could not be read." });
   }
 
   /** Keeps the recordings of the footage, or gives them back to retention. For managers. */

@@ -162,19 +162,21 @@ export class Server {
     });
   }
 
-  /** An answer that holds pictures; a JSON answer, whatever its status, is a failure. */
+  /**
+   * An answer that holds pictures, or a file of them; a JSON answer, whatever its status, is a failure. `noAnswer` is
+   * what to say where the host's handler gave none, as for a camera that cannot be opened: no user would understand that.
+   */
   async media(
     api: string,
     method: string,
     parameters: Record<string, string>,
-    { signal }: { signal: AbortSignal },
+    { signal, noAnswer = "No picture was received." }: { signal: AbortSignal; noAnswer?: string },
   ): Promise<Response> {
     const answer = await fetch(address(api, method, parameters), { signal });
     if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
     if (answer.status === 401) this.#onSessionEnd();
     const failure = await failureOf(answer);
-    // For a camera that cannot be opened the host says that its handler gave no answer, which no user would understand.
-    throw failure.status === 502 ? new ServerError(502, failure.code, "No picture was received.") : failure;
+    throw failure.status === 502 ? new ServerError(502, failure.code, noAnswer) : failure;
   }
 
   /**

@@ -3,6 +3,7 @@
 // Answers of the server as the user gets to see them, and what is sent to it.
 
 import type { Camera } from "../../../client/src/wire/camera";
+import { Exports } from "../../../client/src/wire/exports";
 import { Server } from "../../../client/src/wire/server";
 
 const json = (status: number, body: unknown) =>
@@ -16,6 +17,7 @@ const cameras = (server: Server) => server.cameras();
 const login = (server: Server) => server.login("admin", "secret");
 const snapshot = (server: Server) => server.snapshot(kMjpeg);
 const live = (server: Server) => server.live(kMjpeg, 1, new AbortController().signal);
+const exported = (server: Server) => new Exports(server).open([1], 0, 60, new AbortController().signal);
 
 test.each([
   ["a handler's error with HTTP 200", cameras, () => json(200, failure(400)), "The server refused.", false],
@@ -32,6 +34,7 @@ test.each([
   ["a snapshot without picture", snapshot, () => json(504, failure(504)), "The camera sends no picture.", false],
   ["a snapshot refused with HTTP 200", snapshot, () => json(200, failure(400)), "The server refused.", false],
   ["a camera that cannot be opened", live, () => json(502, failure(502, "the handler gave no answer")), "No picture was received.", false],
+  ["an export whose recordings cannot be read", exported, () => json(502, failure(502, "the handler gave no answer")), "The recordings could not be read.", false],
   ["a stream whose session ended", live, () => json(401, failure(401)), "You are not logged in.", true],
   ["a stream too many", live, () => json(503, failure(503)), "The server is busy.", false],
 ])("says what went wrong: %s", async (_name, call, answer, message, endsSession) => {
