@@ -6,6 +6,11 @@ import type { Page } from "playwright-core";
 
 type Point = { x: number; y: number };
 
+export async function middleOf(page: Page, selector: string): Promise<Point> {
+  const { x, y, width, height } = (await page.locator(selector).boundingBox())!;
+  return { x: x + width / 2, y: y + height / 2 };
+}
+
 export class Fingers {
   private constructor(readonly send: (type: "touchStart" | "touchMove" | "touchEnd", touchPoints: Point[]) => Promise<unknown>) {}
 
@@ -16,8 +21,8 @@ export class Fingers {
 
   /** Moves two fingers apart, to five times their distance, around the middle of what is there. */
   async spread(page: Page, selector: string): Promise<void> {
-    const { x, y, width, height } = (await page.locator(selector).boundingBox())!;
-    const at = (px: number) => [-px, px].map((off) => ({ x: x + width / 2 + off, y: y + height / 2 }));
+    const { x, y } = await middleOf(page, selector);
+    const at = (px: number) => [-px, px].map((off) => ({ x: x + off, y }));
     await this.send("touchStart", at(20));
     for (let px = 30; px <= 100; px += 10) await this.send("touchMove", at(px));
     await this.send("touchEnd", []);

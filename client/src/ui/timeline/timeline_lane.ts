@@ -32,10 +32,10 @@ export function chosenOf(outline: LaneOutline, kinds: ReadonlySet<EventKind>): L
   };
 }
 
-/** Each has a contrast of at least 3 : 1 to the page, and differs from the one before. */
-const kRecorded = "#5a6672";
-const kContinuous = "#7b8896";
-const kSelected = "#c3ced8";
+/** Each has a contrast of at least 4.5 : 1 to the lanes, and differs from the one before. */
+const kRecorded = "#7a8794";
+const kContinuous = "#a3afbb";
+const kSelected = "#e4eaf0";
 /** Events of this width or more are drawn apart from their neighbours. */
 const kMinSinglePx = 2;
 
@@ -177,7 +177,8 @@ function paintTexts(
 
 function fitting(context: CanvasRenderingContext2D, text: string, roomPx: number): string {
   if (roomPx < 40) return "";
-  if (context.measureText(text).width <= roomPx) return text;
-  const letters = Math.floor((text.length * roomPx) / context.measureText(text).width) - 1;
+  const { width } = context.measureText(text);
+  if (width <= roomPx) return text;
+  const letters = Math.floor((text.length * roomPx) / width) - 1;
   return letters > 2 ? `${text.slice(0, letters)}…` : "";
 }

@@ -4,6 +4,7 @@
 
 import { execFileSync } from "node:child_process";
 import type { Page } from "playwright-core";
+import { Fingers, middleOf } from "../../support/fingers";
 import { hasBrowser, ServedClient, smallControls } from "../../support/served_client";
 
 /** Pictures of H.264 that are white for the first four of each 25, else black. */
@@ -108,7 +109,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await page.waitForSelector(".tile[data-camera='2'] :focus");
   }, 40_000);
 
-  test("tiles change places by mouse and keys, and stay there; one can be large; a picture can be magnified", async () => {
+  test("tiles change places by mouse, finger and keys, and stay there; one can be large; a picture can be magnified", async () => {
     const page = await loggedIn(4);
     const order = () => page.locator(".tile").evaluateAll((tiles) => tiles.map((tile) => (tile as HTMLElement).dataset["camera"]).join(""));
     await page.focus("[data-camera='1'] .tile-open");
@@ -116,6 +117,14 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     expect(await order()).toBe("2134");
     await page.dragAndDrop("[data-camera='2'] .tile-open", "[data-camera='4'] .tile-open");
     expect([await order(), await page.locator(".large").count()], "the end of a drag is no click").toEqual(["1342", 0]);
+    const fingers = await Fingers.of(page);
+    const [from, to] = await Promise.all([2, 1].map((id) => middleOf(page, `[data-camera='${id}'] .tile-open`)));
+    await fingers.send("touchStart", [from!]);
+    await page.waitForSelector("[data-camera='2'].is-dragged");
+    await fingers.send("touchMove", [to!]);
+    await fingers.send("touchEnd", []);
+    expect([await order(), await page.locator(".large").count()], "after a long press a finger drags too").toEqual(["2134", 0]);
+    await page.dragAndDrop("[data-camera='2'] .tile-open", "[data-camera='4'] .tile-open");
     await page.click("[data-layout='first']");
     await page.reload();
     await page.waitForFunction(() => {
