@@ -75,11 +75,11 @@ store::Host RemoveHost(store::Store& store, const Actor& actor, const std::strin
     return host;
 }
 
-int BalanceHosts(store::Store& store, const Actor& actor) {
+int BalanceHosts(store::Store& store, const Actor& actor, const std::set<int>& offline) {
     std::vector<store::CameraMove> moves;
     Apply(store, actor, [&] {
         store::CameraLeases leases(store);
-        moves = store::MovesToBalance(store::Hosts(store).All(), leases.List());
+        moves = store::MovesToBalance(store::Hosts(store).All(), leases.List(), offline);
         Json::Value moved;
         for (const auto& [camera, host] : moves) {
             leases.Move(camera.camera_id, host);

@@ -7,6 +7,7 @@
 #pragma once
 
 #include <cstdint>
+#include <set>
 #include <string>
 
 #include <json/json.h>
@@ -47,9 +48,9 @@ std::int64_t FootageOf(store::Store& store, int host);
 store::Host RemoveHost(store::Store& store, const Actor& actor, const std::string& name, bool confirmed);
 
 // Redistributes the floating cameras: has hosts that have much to do (store/host_loads.h) give some to those that have
-// little. Fixed cameras count towards what a host has; hosts that drain, are full or have no mount to record to take no
-// part. Returns how many are to move.
-int BalanceHosts(store::Store& store, const Actor& actor);
+// little. Fixed cameras count towards what a host has. Hosts that drain, are full, are among the offline ones or have
+// no mount to record to take no part. Returns how many are to move.
+int BalanceHosts(store::Store& store, const Actor& actor, const std::set<int>& offline);
 
 // The id of the host of that name, 0 for kAnyHost. Throws store::NotFound.
 int HostNamed(store::Store& store, const std::string& name);

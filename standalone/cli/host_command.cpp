@@ -3,6 +3,7 @@
 // lookhaven host: the machines that share one store in PostgreSQL, and with it cameras, recordings and accounts.
 #include <algorithm>
 #include <optional>
+#include <set>
 #include <string>
 
 #include "standalone/admin/change.h"
@@ -64,13 +65,17 @@ void Add(const Console& console, const Request& request) try {
     throw Failure(kDataError, "this machine's web server has no certificate yet: ", error.what());
 }
 
-// As the recorder of this machine sees them, which watches their heartbeats.
+// The recorder of this machine runs, which watches the heartbeats of the others.
+bool IsWatching(const base::Installation& installation) {
+    return control::FindRecorder(installation) == control::RecorderState::kAlive;
+}
+
+// As the recorder of this machine sees them.
 void List(const Console& console) {
     const base::Installation installation = console.Installation();
     store::Store store = console.OpenStore();
-    const bool is_watching = control::FindRecorder(installation) == control::RecorderState::kAlive;
     const auto states =
-        is_watching ? maintenance::ReadHostStatus(installation) : std::vector<maintenance::HostStatus>();
+        IsWatching(installation) ? maintenance::ReadHostStatus(installation) : std::vector<maintenance::HostStatus>();
     const auto leases = store::CameraLeases(store).List();
     const auto hosts = store::Hosts(store).All();
     const store::HostLoads loads(hosts, leases);
@@ -97,8 +102,10 @@ void Drain(const Console& console, const Request& request) {
 }
 
 void Balance(const Console& console) {
+    const base::Installation installation = console.Installation();
     store::Store store = console.OpenStore();
-    const int cameras = admin::BalanceHosts(store, {});
+    const auto offline = IsWatching(installation) ? maintenance::OfflineHosts(installation) : std::set<int>();
+    const int cameras = admin::BalanceHosts(store, {}, offline);
     console.Answer(Object("cameras", cameras),
                    cameras == 0 ? "No camera has to move." : Concat(cameras, " cameras move."));
 }

@@ -17,9 +17,8 @@ namespace lookhaven::doctor {
 namespace {
 
 void AddOffline(const base::Installation& installation, const std::vector<store::Host>& hosts, Findings& findings) {
-    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(installation)) {
-        const auto host = std::ranges::find(hosts, status.host, &store::Host::id);
-        if (host != hosts.end() && status.state == maintenance::HostState::kOffline) {
+    for (const int id : maintenance::OfflineHosts(installation)) {
+        if (const auto host = std::ranges::find(hosts, id, &store::Host::id); host != hosts.end()) {
             findings.push_back({base::Concat("host ", host->name,
                                              " is offline: ", "its recorder does not run, or does not reach the store"),
                                 "start Lookhaven there; where it is gone for good, remove the host"});
@@ -28,15 +27,10 @@ void AddOffline(const base::Installation& installation, const std::vector<store:
 }
 
 // As after the return of a host that was offline.
-void AddUnequalLoads(const base::Installation& installation, std::vector<store::Host> hosts, store::Store& store,
+void AddUnequalLoads(const base::Installation& installation, const std::vector<store::Host>& hosts, store::Store& store,
                      Findings& findings) {
     const auto cameras = store::CameraLeases(store).List();
-    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(installation)) {
-        if (status.state == maintenance::HostState::kOffline) {
-            std::erase_if(hosts, [&status](const store::Host& host) { return host.id == status.host; });
-        }
-    }
-    const auto moves = store::MovesToBalance(hosts, cameras);
+    const auto moves = store::MovesToBalance(hosts, cameras, maintenance::OfflineHosts(installation));
     if (moves.size() < 2) {
         return;
     }

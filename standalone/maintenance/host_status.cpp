@@ -50,4 +50,14 @@ std::vector<HostStatus> ReadHostStatus(const base::Installation& installation) {
     return hosts;
 }
 
+std::set<int> OfflineHosts(const base::Installation& installation) {
+    std::set<int> offline;
+    for (const HostStatus& each : ReadHostStatus(installation)) {
+        if (each.state == HostState::kOffline) {
+            offline.insert(each.host);
+        }
+    }
+    return offline;
+}
+
 }  // namespace lookhaven::maintenance

@@ -9,6 +9,7 @@
 // Why so        Only a process that watches a heartbeat for a while can tell whether it still changes.
 #pragma once
 
+#include <set>
 #include <vector>
 
 #include "standalone/base/installation.h"
@@ -36,5 +37,8 @@ void WriteHostStatus(const base::Installation& installation, const std::vector<H
 
 // As ReadCameraStatus: a recorder that has ended leaves its last report behind.
 std::vector<HostStatus> ReadHostStatus(const base::Installation& installation);
+
+// The ids of those that are offline, of the same report.
+std::set<int> OfflineHosts(const base::Installation& installation);
 
 }  // namespace lookhaven::maintenance

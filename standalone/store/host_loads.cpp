@@ -54,10 +54,11 @@ HostLoad HostLoads::With(int host, std::int64_t bytes_per_second) const {
     return load;
 }
 
-std::vector<CameraMove> MovesToBalance(const std::vector<Host>& hosts, const std::vector<CameraLease>& cameras) {
+std::vector<CameraMove> MovesToBalance(const std::vector<Host>& hosts, const std::vector<CameraLease>& cameras,
+                                       const std::set<int>& offline) {
     std::vector<Host> sharing;
-    std::ranges::copy_if(hosts, std::back_inserter(sharing), [](const Host& host) {
-        return host.room == HostRoom::kFree && !host.draining && !host.recorder.empty();
+    std::ranges::copy_if(hosts, std::back_inserter(sharing), [&offline](const Host& host) {
+        return !offline.contains(host.id) && host.room == HostRoom::kFree && !host.draining && !host.recorder.empty();
     });
     HostLoads loads(sharing, cameras);
     std::map<int, std::vector<CameraLease>> floating;  // not moved yet, by host

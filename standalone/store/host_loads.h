@@ -9,6 +9,7 @@
 #include <compare>
 #include <cstdint>
 #include <map>
+#include <set>
 #include <vector>
 
 #include "standalone/store/camera_leases.h"
@@ -51,7 +52,8 @@ struct CameraMove {
 };
 
 // The moves of floating cameras after which the hosts have equally much to do, as far as that is worth a gap in a
-// recording. Hosts that drain, are full or have no recorder or mount take no part.
-std::vector<CameraMove> MovesToBalance(const std::vector<Host>& hosts, const std::vector<CameraLease>& cameras);
+// recording. Hosts that drain, are full, are offline or have no recorder or mount take no part.
+std::vector<CameraMove> MovesToBalance(const std::vector<Host>& hosts, const std::vector<CameraLease>& cameras,
+                                       const std::set<int>& offline);
 
 }  // namespace lookhaven::store

@@ -7,6 +7,8 @@
 #include <optional>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/common_config.h"
+#include "standalone/maintenance/host_status.h"
 #include "standalone/store/camera_leases.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
@@ -111,6 +113,13 @@ TEST_F(CliHostsTest, CamerasAreFixedDrainedAndBalanced) {
         ASSERT_TRUE(leases.Take(lease, first, 0));
         floating += lease.fixed_host_id == 0 ? 1 : 0;
     }
+    const auto report = [&](maintenance::HostState state) {
+        maintenance::WriteHostStatus(base::Installation(home_), {{second, state, 0}});
+    };
+    control::CommonConfigKeeper(base::Installation(home_)).Refresh(false);
+    report(maintenance::HostState::kOffline);
+    Play({{"host balance", 0, "No camera has to move"}});
+    report(maintenance::HostState::kOnline);
     Play({{"host balance", 0, std::to_string(floating / 2) + " cameras move"}});
     EXPECT_EQ(std::ranges::count(leases.List(), second, &store::CameraLease::next_host_id), floating / 2);
     EXPECT_EQ(leases.List().front().next_host_id, 0) << "it is fixed";
