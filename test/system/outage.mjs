@@ -26,6 +26,9 @@ await visit(async (first) => {
     cameras: ["#settings=cameras", ".camera-row"],
     accounts: ["#settings=accounts", ".record-row"],
     storage: ["#settings=storage", ".record-card"],
+    maps: ["#settings=maps", ".emap-row"],
+    devices: ["#settings=devices", ".device-row"],
+    hosts: ["#settings=hosts", ".record-card, .settings-state"],
     system: ["#settings=system", ".health-summary"],
     audit: ["#settings=audit", ".audit-entry, .settings-state"],
   };
@@ -58,6 +61,7 @@ await visit(async (first) => {
   for (const [name, [, content]] of Object.entries(goes)) {
     await tabs[name].bringToFront();
     await tabs[name].locator(content).first().waitFor({ timeout: 30_000 });
+    await tabs[name].getByText("does not answer").first().waitFor({ state: "hidden" });
     await tabs[name].screenshot({ path: `${folder}/back-${name}.png` });
   }
   await report("all back", { lost, resumed });
