@@ -10,6 +10,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
   // Playwright cannot read what a request of Firefox sends.
   test.skipIf(isFirefox)("changes that are not saved are asked about on every way out, and stay where the user does", async () => {
     client.server.hasSession = true;
+    client.server.cameras.push({ id: 1, name: "Entrance", video_type: 1 });
     const place = { id: 1, hxId: 0, name: "Entrance", x: 5, y: 5, direction: 0, textPos: 0, iconCenterX: 0, iconCenterY: 0 };
     const map = { hideItemName: false, smallItemSize: false, items: [{ type: 0, ...place }] };
     client.server.answers = {
@@ -21,7 +22,13 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     client.server.emap = { ...map, emap: "", emapType: "png" };
     const page = await client.open(`${client.address}#events`, 1440, 900);
     await page.evaluate(() => (location.hash = "#map=1"));
-    await page.waitForSelector(".map-item");
+    await page.click(".map-item");
+    await page.locator(".large").getByRole("button", { name: /^Last 30 seconds of / }).click();
+    await page.waitForSelector(".stage-caption");
+    for (const shown of [".large", ".map-item"]) {
+      await page.goBack();
+      await page.waitForSelector(shown);
+    }
     await page.keyboard.press("e");
     await page.focus(".map-editor .map-item");
     await page.keyboard.press("ArrowRight");

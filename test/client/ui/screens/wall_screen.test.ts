@@ -125,6 +125,11 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await fingers.send("touchEnd", []);
     expect([await order(), await page.locator(".large").count()], "after a long press a finger drags too").toEqual(["2134", 0]);
     await page.dragAndDrop("[data-camera='2'] .tile-open", "[data-camera='4'] .tile-open");
+    await page.click("[data-layout='4']");
+    await page.waitForFunction(() => {
+      const [tile, grid] = [document.querySelector(".tile")!.getBoundingClientRect(), document.querySelector(".grid")!.getBoundingClientRect()];
+      return [grid.width / tile.width, grid.height / tile.height].every((ratio) => ratio >= 4 && ratio < 5);
+    });
     await page.click("[data-layout='first']");
     await page.reload();
     await page.waitForFunction(() => {
