@@ -97,6 +97,12 @@ std::map<int, PendingMark> EventRowQueue::PendingMarks() const {
     return pending_marks_;
 }
 
+std::optional<PendingMark> EventRowQueue::FindPendingMark(int id) const {
+    const std::lock_guard lock(mutex_);
+    const auto found = pending_marks_.find(id);
+    return found == pending_marks_.end() ? std::nullopt : std::optional(found->second);
+}
+
 std::optional<int> EventRowQueue::FirstReservedId() const {
     const std::lock_guard lock(mutex_);
     return first_reserved_id_;

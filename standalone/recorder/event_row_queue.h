@@ -63,6 +63,8 @@ class EventRowQueue {
 
     // The marks whose footage is still to come, by id, as of the last refresh.
     std::map<int, PendingMark> PendingMarks() const;
+    // Of one of them; nothing where it is not known.
+    std::optional<PendingMark> FindPendingMark(int id) const;
     // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
     std::optional<int> FirstReservedId() const;
 

@@ -265,10 +265,9 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
     if (IsHeldElsewhere(mark.camera_id) && base::WallSeconds() < mark.end_s + kFootageElsewhereS) {
         return false;  // another host may record more of it
     }
-    const std::map<int, PendingMark> pending = rows_.PendingMarks();
-    const auto known = pending.find(mark.id);
-    return known != pending.end() && (are_mounts_recovered_ || mark.start_s > started_s_) &&
-           rows_.HasStored(mark.camera_id, known->second.record_until_s);
+    const std::optional<PendingMark> pending = rows_.FindPendingMark(mark.id);
+    return pending && (are_mounts_recovered_ || mark.start_s > started_s_) &&
+           rows_.HasStored(mark.camera_id, pending->record_until_s);
 }
 
 bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
