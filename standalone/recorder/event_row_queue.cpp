@@ -210,7 +210,9 @@ void EventRowQueue::NotePending(std::vector<store::Mark> marks) {
         const std::int64_t until_s = known != pending_marks_.end() ? known->second.record_until_s
                                      : is_late                     ? now_s + kLateRecordingS
                                                                    : mark.end_s;
-        pending.emplace(mark.id, PendingMark{std::move(mark), until_s});
+        PendingMark& entry = pending[mark.id];
+        entry.mark = std::move(mark);
+        entry.record_until_s = until_s;
     }
     pending_marks_ = std::move(pending);
 }
