@@ -27,6 +27,20 @@ void Sync(const std::filesystem::path& folder) {
     }
 }
 
+// A link, or a copy of what only its owner may link.
+void Carry(const std::filesystem::path& file, const std::filesystem::path& folder) {
+    namespace fs = std::filesystem;
+    const fs::path carried = folder / file.filename();
+    std::error_code refused;
+    fs::create_hard_link(file, carried, refused);
+    if (refused) {
+        fs::copy_file(file, carried, refused);
+    }
+    if (refused) {
+        throw store::InvalidRecord(file.string() + " cannot be copied (" + refused.message() + "): move it elsewhere");
+    }
+}
+
 }  // namespace
 
 CertificateFolder::CertificateFolder(const base::Installation& installation)
@@ -80,7 +94,7 @@ void CertificateFolder::Prepare(const std::string& certificates, const std::stri
             throw store::InvalidRecord("the folder " + used_.string() + " holds another folder, " + name.string() +
                                        ": move that elsewhere first");
         } else {
-            fs::create_hard_link(entry.path(), other_ / name);
+            Carry(entry.path(), other_);
         }
     }
     base::WriteFileAtomically(other_ / kKey, key);

@@ -29,8 +29,8 @@ class CertificateFolder {
     // Those in use; empty where there is none that can be read. Needs no lock.
     static std::string Certificates(const base::Installation& installation);
     // Writes both, readable by the owner alone, to what is not in use. Throws store::InvalidRecord where the folder in
-    // use is a link or has folders in it, which are the owner's to take away. What a process that died has left becomes
-    // the folder tls.before.
+    // use is a link, or has folders or unreadable files in it, which are the owner's to take away. What a process that
+    // died has left becomes the folder tls.before.
     void Prepare(const std::string& certificates, const std::string& key);
     // What was prepared is in use, and what was in use is not; the next call undoes that. Where it throws, neither has
     // happened.

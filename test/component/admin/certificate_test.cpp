@@ -166,6 +166,31 @@ TEST_P(CertificateTest, LeavesAFolderAloneThatIsNotAsTheServerMadeIt) {
     EXPECT_TRUE(Audited().empty());
 }
 
+TEST_P(CertificateTest, BringsAlongAFileOfAnotherUser) {
+    constexpr uid_t kNobody = 65534;
+    const std::filesystem::path file = installation_.TlsFolder() / "chain.pem";
+    base::WriteFileAtomically(file, "theirs", 0644);
+    std::vector<std::filesystem::path> changed{folder_.Path(), installation_.Home()};
+    changed.insert(changed.end(), begin(std::filesystem::directory_iterator(installation_.Home())), {});
+    for (const std::filesystem::path& each : changed) {
+        if (::chown(each.c_str(), kNobody, kNobody) != 0) {
+            GTEST_SKIP() << "only root can give files away";
+        }
+    }
+    const CertificateOffer offer = Offer("ec");
+    const pid_t child = ::fork();
+    if (child == 0) {
+        EXPECT_EQ(::seteuid(kNobody), 0);
+        CertificateFolder folder(installation_);
+        folder.Prepare(offer.certificates, offer.key);
+        folder.Exchange();
+        ::_exit(base::ReadFile(file) == "theirs" ? 0 : 1);
+    }
+    int status = -1;
+    ::waitpid(child, &status, 0);
+    EXPECT_EQ(status, 0);
+}
+
 LOOKHAVEN_ON_BOTH_ENGINES(CertificateTest);
 
 }  // namespace
