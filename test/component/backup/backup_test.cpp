@@ -12,6 +12,8 @@
 
 #include "standalone/base/file.h"
 #include "standalone/emap/pictures.h"
+#include "standalone/store/access_tokens.h"
+#include "standalone/store/cameras.h"
 #include "standalone/store/emap_pictures.h"
 #include "standalone/store/users.h"
 #include "test/support/folder.h"
@@ -49,10 +51,16 @@ class BackupTest : public testing::Test {
 
 TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     std::string image;
+    std::string secret;
     const std::string of_other_host = "1-0123456789abcdef.svg";
     {
         store::Store store = store::Store::Open(old_.StoreUrl());
         store::Users(store).Add("bob", "correct horse", store::Privilege::kOwner);
+        const int yard =
+            store::Cameras(store).Add({.name = "Yard", .profiles = {{.source = "test:mjpeg"}}, .max_age_s = 86400});
+        secret = store::AccessTokens(store)
+                     .Add({.name = "Till", .camera_ids = {yard}, .may_pos = true, .creator = "bob"})
+                     .secret;
         const int map = store::Emaps(store).Add({.name = "Ground floor"});
         image = emap::Pictures(store, old_.Home()).Write("<svg/>");
         store::Emaps(store).SetImage(map, image);
@@ -80,6 +88,8 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     EXPECT_FALSE(fs::exists(third.SigningKeyFile()));
     store::Store store = store::Store::Open(new_.StoreUrl());
     EXPECT_TRUE(store::Users(store).CheckPassword("bob", "correct horse"));
+    EXPECT_EQ(store::Cameras(store).List().at(0).max_age_s, 86400);
+    EXPECT_EQ(store::AccessTokens(store).FindBySecret(secret).value_or(store::AccessToken()).camera_ids, std::set{1});
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(image), "<svg/>");
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(of_other_host), "<svg>2</svg>");
     EXPECT_FALSE(store::EmapPictures(store).Find(of_other_host)) << "once is enough";
