@@ -7,22 +7,19 @@
 #include <map>
 #include <optional>
 #include <sstream>
-#include <system_error>
 #include <vector>
 
 #include <unistd.h>
 
 #include "standalone/api/health.h"
 #include "standalone/api/metrics_text.h"
+#include "standalone/api/mount_metrics.h"
 #include "standalone/api/store_metrics.h"
 #include "standalone/base/clock.h"
 #include "standalone/base/process.h"
 #include "standalone/control/common_config.h"
 #include "standalone/control/stream_counters.h"
-#include "standalone/maintenance/mount_folder.h"
-#include "standalone/maintenance/mount_status.h"
-#include "standalone/store/events.h"
-#include "standalone/store/mounts.h"
+#include "standalone/ring/inventory.h"
 
 namespace lookhaven::api {
 
@@ -89,6 +86,9 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
                [](const Counters& each) { return static_cast<double>(each.dropped_pictures); });
     AddStreams(text, streams, "lookhaven_recording_queue_bytes", "gauge", "Bytes that wait for the disk.", true,
                [](const Counters& each) { return static_cast<double>(each.queued_bytes); });
+    AddStreams(text, streams, "lookhaven_recording_queue_limit_bytes", "gauge",
+               "How much may wait before pictures are dropped.", true,
+               [](const Counters& each) { return static_cast<double>(each.queue_bytes); });
     AddStreams(text, streams, "lookhaven_recording_lag_seconds", "gauge",
                "How old the newest picture is that the disk has, but for half a second.", true,
                [&](const Counters& each) { return (now_us - static_cast<double>(each.written_us)) / 1e6; });
@@ -99,68 +99,25 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
     }
 }
 
-struct MountFigures {
-    store::Mount mount;
-    bool is_up = false;
-    maintenance::MountSpace space;
-    std::optional<std::int64_t> oldest_s;
-};
-
-std::vector<MountFigures> LookAtMounts(const base::Installation& installation, store::Store& records) {
-    std::map<int, maintenance::MountState> states;
-    for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
-        states.emplace(status.mount, status.state);
-    }
-    std::vector<MountFigures> mounts;
-    for (const store::Mount& mount : store::Mounts(records).List()) {
-        if (!mount.IsOf(installation.HostId())) {
-            continue;
-        }
-        MountFigures& figures = mounts.emplace_back();
-        figures.mount = mount;
-        const auto oldest = store::Events(records).InRecordingOrder(mount.id, store::Event(), 1);
-        figures.oldest_s = oldest.empty() ? std::nullopt : std::optional(oldest.front().start_s);
-        try {
-            if (const auto folder = maintenance::OpenMount(records, mount)) {
-                figures.space = folder->Space();
-                const auto state = states.find(mount.id);
-                figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady ||
-                                state->second == maintenance::MountState::kKeptFull;
-            }
-        } catch (const std::system_error&) {
-            figures.is_up = false;  // and why, the health says
-        }
-    }
-    return mounts;
-}
-
-void AddMounts(MetricsText& text, const base::Installation& installation, store::Store& records) {
-    const std::vector<MountFigures> mounts = LookAtMounts(installation, records);
-    const auto add = [&](const char* name, const char* help, const auto& value) {
-        text.Family(name, "gauge", help);
-        for (const MountFigures& each : mounts) {
-            if (const std::optional<double> number = value(each)) {
-                text.Sample(*number, {{"mount", std::to_string(each.mount.id)}, {"name", each.mount.name}});
-            }
+// Between the recorder and its viewers.
+void AddRings(MetricsText& text, const base::Installation& installation) {
+    std::vector<ring::SegmentState> rings = ring::ListSegments(installation);
+    std::erase_if(rings, [](const ring::SegmentState& each) { return !each.writer_alive; });
+    const auto add = [&](const char* name, const char* type, const char* help, auto field) {
+        text.Family(name, type, help);
+        for (const ring::SegmentState& each : rings) {
+            text.Sample(static_cast<double>(each.*field),
+                        {{"camera", std::to_string(each.id.camera)},
+                         {"stream", std::to_string(each.id.stream)},
+                         {"medium", each.id.medium == base::Medium::kVideo ? "video" : "audio"}});
         }
     };
-    const auto space = [](std::int64_t bytes) {
-        return [bytes](const MountFigures& each) {
-            return each.space.total_bytes > 0 ? std::optional(static_cast<double>(bytes)) : std::nullopt;
-        };
-    };
-    add("lookhaven_mount_up", "Whether the mount is enabled, its disk is there, and its maintenance succeeds.",
-        [](const MountFigures& each) { return std::optional(each.mount.enabled && each.is_up ? 1.0 : 0.0); });
-    add("lookhaven_mount_size_bytes", "Size of its file system.",
-        [&](const MountFigures& each) { return space(each.space.total_bytes)(each); });
-    add("lookhaven_mount_free_bytes", "What is free there.",
-        [&](const MountFigures& each) { return space(each.space.free_bytes)(each); });
-    add("lookhaven_mount_reserve_bytes", "What recording leaves free there.",
-        [&](const MountFigures& each) { return space(each.space.ReserveBytes())(each); });
-    add("lookhaven_mount_oldest_recording_timestamp_seconds", "When its oldest recording began that may be deleted.",
-        [](const MountFigures& each) {
-            return each.oldest_s ? std::optional(static_cast<double>(*each.oldest_s)) : std::nullopt;
-        });
+    using State = ring::SegmentState;
+    add("lookhaven_ring_size_bytes", "gauge", "What a stream's ring has room for.", &State::arena_bytes);
+    add("lookhaven_ring_used_bytes", "gauge", "What the frames in it take.", &State::used_bytes);
+    add("lookhaven_ring_readers", "gauge", "Viewers that read it.", &State::readers);
+    add("lookhaven_ring_dropped_frames_total", "counter", "Frames that had no room beside what viewers read.",
+        &State::entries_dropped);
 }
 
 // "VEXO.Event/List": the API's name, and the method's where it is known.
@@ -250,6 +207,7 @@ std::string MetricsOf(const Call& call, store::Store* records) {
     MetricsText text;
     const base::Installation& installation = call.context.Installation();
     AddRecorder(text, installation);
+    AddRings(text, installation);
     AddUptimes(text, installation);
     AddStore(text, records);
     try {

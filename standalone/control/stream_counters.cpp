@@ -10,7 +10,7 @@ namespace lookhaven::control {
 
 namespace {
 
-constexpr std::uint64_t kVersion = 0x6c68'7374'6303;  // with the layout
+constexpr std::uint64_t kVersion = 0x6c68'7374'6304;  // with the layout
 constexpr std::size_t kMaxStreams = 1024;
 
 std::filesystem::path PathOf(const base::Installation& installation) {
@@ -28,6 +28,7 @@ struct Row {
     std::atomic<bool> is_recorded;
     std::atomic<std::uint64_t> dropped_pictures;
     std::atomic<std::uint64_t> queued_bytes;
+    std::atomic<std::uint64_t> queue_bytes;
     std::atomic<std::int64_t> written_us;
     std::atomic<std::int64_t> stored_us;
 };
@@ -43,6 +44,7 @@ void Store(Row& row, const StreamCounters& from) {
     row.is_recorded = from.is_recorded;
     row.dropped_pictures = from.dropped_pictures;
     row.queued_bytes = from.queued_bytes;
+    row.queue_bytes = from.queue_bytes;
     row.written_us = from.written_us;
     row.stored_us = from.stored_us;
 }
@@ -59,6 +61,7 @@ StreamCounters Load(const Row& row) {
             .is_recorded = row.is_recorded,
             .dropped_pictures = row.dropped_pictures,
             .queued_bytes = row.queued_bytes,
+            .queue_bytes = row.queue_bytes,
             .written_us = row.written_us,
             .stored_us = row.stored_us};
 }

@@ -31,7 +31,8 @@ struct StreamCounters {
     // These concern its recording, if it is recorded.
     bool is_recorded = false;
     std::uint64_t dropped_pictures = 0;  // because the disk was too slow
-    std::uint64_t queued_bytes = 0;      // waiting for the disk
+    std::uint64_t queued_bytes = 0;      // waiting for the disk …
+    std::uint64_t queue_bytes = 0;       // … of at most these
     std::int64_t written_us = 0;         // up to when what had come is on the disk
     std::int64_t stored_us = 0;          // when the store had the rows of all recordings
 

@@ -55,6 +55,7 @@ class FrameQueue {
     };
     Drops Dropped() const;
     std::size_t QueuedBytes() const;
+    std::size_t CapacityBytes() const { return capacity_bytes_; }
 
   private:
     void SetFormat(const media::Packet& packet, const std::optional<media::StreamFormat>& audio);

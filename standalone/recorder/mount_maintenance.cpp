@@ -28,6 +28,7 @@ MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, boo
       context_(std::move(context)),
       disk_watch_{maintenance::SpaceWatch(is_space_held), maintenance::SpaceWatch(is_space_held)},
       status_{mount_id, is_space_held ? MountState::kSpaceHeld : MountState::kReady, ""},
+      counters_{.mount = mount_id},
       thread_(context_.store_url, "maintain mount " + std::to_string(mount_id),
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
 
@@ -39,6 +40,11 @@ void MountMaintenance::Pause::Begin(std::int64_t now_us) {
 maintenance::MountStatus MountMaintenance::Status() const {
     const std::lock_guard lock(mutex_);
     return status_;
+}
+
+control::MountCounters MountMaintenance::Counters() const {
+    const std::lock_guard lock(mutex_);
+    return counters_;
 }
 
 void MountMaintenance::Work(store::Store& store) {
@@ -95,15 +101,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const int space_requests = context_.space_requests;
     if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
-        store::FootageRemovals(store).BeginDeletions();
-        const maintenance::DeletionResult deleted = maintenance::EnforceRetention(
-            store, mount,
-            {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits, now_us},
-            disk_watch_);
-        if (deleted.events > 0) {
-            base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
-                          " old events");
-        }
+        EnforceRetention(store, mount, clock);
         is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
     }
     if (!recovery_failure_.empty()) {
@@ -114,6 +112,33 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         SetStatus(MountState::kKeptFull, mount.path);
     } else {
         SetStatus(MountState::kReady, "");
+    }
+}
+
+void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock) {
+    maintenance::DeletionResult deleted;
+    const auto count = [&](std::uint64_t failures) {
+        const std::lock_guard lock(mutex_);
+        ++counters_.retention_runs;
+        counters_.retention_failures += failures;
+        counters_.deleted_events += static_cast<std::uint64_t>(deleted.events);
+        counters_.deleted_bytes += static_cast<std::uint64_t>(deleted.bytes);
+    };
+    try {
+        store::FootageRemovals(store).BeginDeletions();
+        deleted = maintenance::EnforceRetention(
+            store, mount,
+            {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits,
+             context_.monotonic_us()},
+            disk_watch_);
+    } catch (...) {
+        count(1);
+        throw;
+    }
+    count(0);
+    if (deleted.events > 0) {
+        base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
+                      " old events");
     }
 }
 

@@ -14,6 +14,7 @@
 #include <string>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/mount_counters.h"
 #include "standalone/maintenance/clock_watch.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/mount_lock.h"
@@ -44,6 +45,8 @@ class MountMaintenance {
     void Ask() { thread_.Ask(); }
 
     maintenance::MountStatus Status() const;
+    // Since this object was made.
+    control::MountCounters Counters() const;
     // What an earlier recorder left on the mount is finished.
     bool IsRecovered() const { return is_recovered_; }
 
@@ -68,6 +71,7 @@ class MountMaintenance {
 
     void Work(store::Store& store);
     void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
+    void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
     const int mount_id_;
@@ -87,6 +91,7 @@ class MountMaintenance {
     std::atomic<bool> is_recovered_ = false;
     mutable std::mutex mutex_;
     maintenance::MountStatus status_;
+    control::MountCounters counters_;
     StoreThread thread_;  // last: it uses the others
 };
 

@@ -32,6 +32,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
       no_data_limit_(no_data_limit),
       flush_requests_(installation),
       camera_status_(installation),
+      mount_counters_(installation),
       status_publisher_([&installation](const StatusPublisher::States& states) {
           maintenance::WriteCameraStatus(installation, states.cameras);
           maintenance::WriteMountStatus(installation, states.mounts);
@@ -167,10 +168,13 @@ void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signa
         recorded.emplace(camera, entry.worker->State());
     }
     StatusPublisher::States states{camera_status_.Combine(std::move(recorded), signals), {}};
+    std::vector<control::MountCounters> counters;
     for (const auto& [id, mount] : mounts_) {
         mount->Ask();
         states.mounts.push_back(mount->Status());
+        counters.push_back(mount->Counters());
     }
+    mount_counters_.Write(counters);
     status_publisher_.Publish(std::move(states));
 }
 
@@ -199,6 +203,7 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
     counters.is_recorded = true;
     counters.dropped_pictures = queue->Dropped().frames;
     counters.queued_bytes = queue->QueuedBytes();
+    counters.queue_bytes = queue->CapacityBytes();
     counters.written_us = entries_.at(counters.stream.camera).worker->WrittenUs();
     counters.stored_us = rows_.StoredUs();
 }

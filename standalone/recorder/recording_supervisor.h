@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "standalone/base/clock.h"
+#include "standalone/control/mount_counters.h"
 #include "standalone/control/stream_counters.h"
 #include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/camera_status_tracker.h"
@@ -68,6 +69,7 @@ class RecordingSupervisor {
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
     CameraStatusTracker camera_status_;
+    control::MountCountersWriter mount_counters_;
     StatusPublisher status_publisher_;
     EventRowQueue rows_;
     std::unique_ptr<CameraLeaseKeeper> camera_leases_;  // null on a single machine

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/ring/inventory.h"
 
+#include <algorithm>
 #include <functional>
 #include <system_error>
 
@@ -67,6 +68,18 @@ bool RemoveDeadWriters(const Attachment& attachment) {
     return true;
 }
 
+// Of the entries in the index, which the writer changes meanwhile.
+std::uint64_t UsedBytes(const View& view) {
+    std::uint64_t blocks = 0;
+    for (std::uint32_t i = 0; i < view.Constants().index_slots; ++i) {
+        const IndexSlot& slot = view.Slot(i);
+        if (const Region region = Region::FromWord(slot.region.load()); slot.count.load() != 0) {
+            blocks += region.blocks;
+        }
+    }
+    return std::min(blocks * kBlockBytes, view.Size().arena_bytes);
+}
+
 }  // namespace
 
 std::vector<SegmentState> ListSegments(const base::Installation& installation) {
@@ -85,6 +98,8 @@ std::vector<SegmentState> ListSegments(const base::Installation& installation) {
             state.heartbeat_age_ms = (base::MonotonicMicros() - view.Head().heartbeat_micros.load()) / 1000;
             state.entries_written = view.Head().newest.load();
             state.entries_dropped = view.Head().dropped.load();
+            state.arena_bytes = view.Size().arena_bytes;
+            state.used_bytes = UsedBytes(view);
             state.readers = ReaderTable(view).Used();
         }
     };

@@ -103,6 +103,12 @@ class MonitoringTest(unittest.TestCase):
         self.assertGreater(now["lookhaven_viewers_private_bytes", live], 4096)
         mount = 'mount="1",name="' + json.loads(self.server.cli("mount", "list", "--json"))[0]["name"] + '"'
         self.assertGreater(now["lookhaven_mount_size_bytes", mount], now["lookhaven_mount_free_bytes", mount])
+        self.assertGreater(now["lookhaven_mount_retention_runs_total", mount], 0)
+        self.assertEqual(now["lookhaven_mount_retention_failures_total", mount], 0)
+        ring = f'{stream_1},medium="video"'
+        self.assertEqual(now["lookhaven_ring_readers", ring], 1)
+        self.assertTrue(0 < now["lookhaven_ring_used_bytes", ring] <= now["lookhaven_ring_size_bytes", ring])
+        self.assertLess(now["lookhaven_recording_queue_bytes", stream_1], now["lookhaven_recording_queue_limit_bytes", stream_1])
         for name in ("recorder", "store"):
             self.assertEqual(now[f"lookhaven_{name}_up", ""], 1)
         self.assertLess(now["lookhaven_recording_lag_seconds", stream_1], 5)
@@ -112,6 +118,14 @@ class MonitoringTest(unittest.TestCase):
             uptime = time.clock_gettime(time.CLOCK_BOOTTIME) - ticks / os.sysconf("SC_CLK_TCK")
             self.assertAlmostEqual(now["lookhaven_process_uptime_seconds", f'process="{process}"'], uptime, delta=10)
         self.assertLess(now["lookhaven_recording_store_lag_seconds", ""], 10)
+
+    def test_alerts_and_dashboard_name_what_there_is(self):
+        there = set(re.findall(r"# TYPE (\w+)", self.get("/metrics")[1]))
+        for file in ("alerts.yml", "dashboard.json"):
+            named = re.findall(r"\blookhaven_\w+", (ROOT / "packaging/monitoring" / file).read_text())
+            missing = {each.removesuffix("_bucket") for each in named} - there
+            # These two are of hosts and of PostgreSQL.
+            self.assertLessEqual(missing, {"lookhaven_host_up", "lookhaven_store_standbys"}, file)
 
     def test_is_well_formed_for_prometheus(self):
         if not shutil.which("promtool"):
