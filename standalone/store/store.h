@@ -28,17 +28,18 @@ class StoreError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// The database server cannot be connected to, or the connection to it was lost: what fails for that alone may be tried
-// again.
+// The store is away: what fails for that alone may be tried again. The database server cannot be connected to, the
+// connection to it was lost, or the store is a SchemaError's.
 class StoreUnavailable : public StoreError {
   public:
     using StoreError::StoreError;
 };
 
-// The schema is missing, older or newer than this program's; the text says what to do.
-class SchemaError : public StoreError {
+// The store is missing, or its schema is older or newer than this program's, as during an upgrade; the text says what
+// to do.
+class SchemaError : public StoreUnavailable {
   public:
-    using StoreError::StoreError;
+    using StoreUnavailable::StoreUnavailable;
 };
 
 // The caller's record breaks a rule, which the text names; nothing was changed.
