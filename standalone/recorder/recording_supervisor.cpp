@@ -8,6 +8,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/recorder/host_room.h"
 #include "standalone/recorder/schedule.h"
 #include "standalone/store/recorder_lease.h"
 
@@ -153,21 +154,11 @@ void RecordingSupervisor::AnswerFlushes() {
 
 void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signals) {
     rows_.Refresh(entries_.size());
-    if (camera_leases_) {
-        std::map<int, std::uint64_t> received;
-        for (const auto& [camera, signal] : signals) {
-            if (signal.is_recorded) {
-                received.emplace(camera, signal.bytes);
-            }
-        }
-        camera_leases_->Ask(Room(), received);
-    }
-    missed_marks_.Ask();
     std::map<int, maintenance::CameraStatus> recorded;
     for (const auto& [camera, entry] : entries_) {
         recorded.emplace(camera, entry.worker->State());
     }
-    StatusPublisher::States states{camera_status_.Combine(std::move(recorded), signals), {}};
+    StatusPublisher::States states;
     std::vector<control::MountCounters> counters;
     for (const auto& [id, mount] : mounts_) {
         mount->Ask();
@@ -175,6 +166,17 @@ void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signa
         counters.push_back(mount->Counters());
     }
     mount_counters_.Write(counters);
+    if (camera_leases_) {
+        std::map<int, std::uint64_t> received;
+        for (const auto& [camera, signal] : signals) {
+            if (signal.is_recorded) {
+                received.emplace(camera, signal.bytes);
+            }
+        }
+        camera_leases_->Ask(RoomOf(states.mounts, recorded), received);
+    }
+    missed_marks_.Ask();
+    states.cameras = camera_status_.Combine(std::move(recorded), signals);
     status_publisher_.Publish(std::move(states));
 }
 
@@ -277,29 +279,6 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
 
 bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
     return camera_leases_ && camera_leases_->IsHeldElsewhere(camera);
-}
-
-store::HostRoom RecordingSupervisor::Room() const {
-    using maintenance::MountState;
-    using maintenance::RecordingState;
-    const auto has_camera = [this](RecordingState state) {
-        return std::ranges::any_of(entries_,
-                                   [state](const auto& entry) { return entry.second.worker->State().state == state; });
-    };
-    // Maintenance also fails where one file cannot be deleted. Cameras need not leave a mount that they record to.
-    const bool is_recording = has_camera(RecordingState::kRecording);
-    store::HostRoom room = store::HostRoom::kNone;
-    for (const auto& [id, mount] : mounts_) {
-        const MountState state = mount->Status().state;
-        if (state == MountState::kReady) {
-            room = store::HostRoom::kFree;
-        } else if (room == store::HostRoom::kNone &&
-                   (state == MountState::kSpaceHeld || state == MountState::kKeptFull ||
-                    (state == MountState::kFailing && is_recording))) {
-            room = store::HostRoom::kFull;
-        }
-    }
-    return room == store::HostRoom::kFree && has_camera(RecordingState::kDiskFull) ? store::HostRoom::kFull : room;
 }
 
 // A thread that cannot be started affects that camera or mount alone, and is tried again. Logged once for each

@@ -59,7 +59,6 @@ class RecordingSupervisor {
     void StartRecording(const control::LiveStream& stream);
     void AnswerFlushes();
     void ReconcileMounts(const CatalogContents& catalog);
-    store::HostRoom Room() const;
     bool FootageHasEnded(const store::Mark& mark) const;
     bool IsHeldElsewhere(int camera) const;
     template <class Work>
