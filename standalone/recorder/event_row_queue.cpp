@@ -18,10 +18,10 @@ constexpr std::size_t kIdsPerCamera = 4;
 // From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
 // second.
 constexpr std::int64_t kMaxDelayS = 3;
-// A mark that becomes known so long after its end may still have footage in memory, which is recorded then; the two
-// seconds leave the camera's thread time to begin.
+// A mark that becomes known so long after its end may still have footage in memory. From when a mark becomes known its
+// camera is recorded for so long at least: the camera's thread is told up to a second later, and may have to try again.
 constexpr std::int64_t kMaxLateMarkS = 10;
-constexpr std::int64_t kLateRecordingS = 2;
+constexpr std::int64_t kLateRecordingS = 4;
 
 }  // namespace
 
@@ -206,9 +206,9 @@ void EventRowQueue::NotePending(std::vector<store::Mark> marks) {
     std::map<int, PendingMark> pending;
     for (store::Mark& mark : marks) {
         const auto known = pending_marks_.find(mark.id);
-        const bool is_late = now_s >= mark.end_s && now_s < mark.end_s + kMaxLateMarkS;
+        const bool may_be_buffered = now_s < mark.end_s + kMaxLateMarkS;
         const std::int64_t until_s = known != pending_marks_.end() ? known->second.record_until_s
-                                     : is_late                     ? now_s + kLateRecordingS
+                                     : may_be_buffered             ? std::max(mark.end_s, now_s + kLateRecordingS)
                                                                    : mark.end_s;
         PendingMark& entry = pending[mark.id];
         entry.mark = std::move(mark);
