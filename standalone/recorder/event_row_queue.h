@@ -26,8 +26,8 @@ namespace lookhaven::recorder {
 
 struct PendingMark {
     store::Mark mark;
-    // Until when its camera is recorded for it (UTC): its end, or a little later where it became known only about then.
-    // What the camera sent before is still buffered.
+    // Until when its camera is recorded for it, in UTC seconds: its end, or some seconds after it became known where that
+    // was late. Earlier frames are recorded as far as the pre-record buffer still has them.
     std::int64_t record_until_s = 0;
 };
 

@@ -28,9 +28,9 @@ await visit(async (first) => {
     storage: ["#settings=storage", ".record-card"],
     maps: ["#settings=maps", ".emap-row"],
     devices: ["#settings=devices", ".device-row"],
-    hosts: ["#settings=hosts", ".record-card, .settings-state"],
+    hosts: ["#settings=hosts", ".record-card, .settings-state:not(:has(.spinner))"],
     system: ["#settings=system", ".health-summary"],
-    audit: ["#settings=audit", ".audit-entry, .settings-state"],
+    audit: ["#settings=audit", ".audit-entry, .settings-state:not(:has(.spinner))"],
   };
   for (const name of Object.keys(goes)) await open(name, "#settings=groups", ".record-row");
   await open("playing", playing, '.stage-picture[data-state="playing"]');
