@@ -28,18 +28,17 @@ class StoreError : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-// The store is away: what fails for that alone may be tried again. The database server cannot be connected to, the
-// connection to it was lost, or the store is a SchemaError's.
+// The database server cannot be connected to, or the connection to it was lost: what fails for that alone may be tried
+// again.
 class StoreUnavailable : public StoreError {
   public:
     using StoreError::StoreError;
 };
 
-// The store is missing, or its schema is older or newer than this program's, as during an upgrade; the text says what
-// to do.
-class SchemaError : public StoreUnavailable {
+// The schema is missing, older or newer than this program's; the text says what to do.
+class SchemaError : public StoreError {
   public:
-    using StoreUnavailable::StoreUnavailable;
+    using StoreError::StoreError;
 };
 
 // The caller's record breaks a rule, which the text names; nothing was changed.
