@@ -88,7 +88,7 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
                [](const Counters& each) { return static_cast<double>(each.queued_bytes); });
     AddStreams(text, streams, "lookhaven_recording_queue_limit_bytes", "gauge",
                "How much may wait before pictures are dropped.", true,
-               [](const Counters& each) { return static_cast<double>(each.queue_bytes); });
+               [](const Counters& each) { return static_cast<double>(each.queue_capacity_bytes); });
     AddStreams(text, streams, "lookhaven_recording_lag_seconds", "gauge",
                "How old the newest picture is that the disk has, but for half a second.", true,
                [&](const Counters& each) { return (now_us - static_cast<double>(each.written_us)) / 1e6; });
@@ -99,7 +99,7 @@ void AddRecorder(MetricsText& text, const base::Installation& installation) {
     }
 }
 
-// Between the recorder and its viewers.
+// The shared memory between the recorder and viewers.
 void AddRings(MetricsText& text, const base::Installation& installation) {
     std::vector<ring::SegmentState> rings = ring::ListSegments(installation);
     std::erase_if(rings, [](const ring::SegmentState& each) { return !each.writer_alive; });
@@ -113,11 +113,12 @@ void AddRings(MetricsText& text, const base::Installation& installation) {
         }
     };
     using State = ring::SegmentState;
-    add("lookhaven_ring_size_bytes", "gauge", "What a stream's ring has room for.", &State::arena_bytes);
-    add("lookhaven_ring_used_bytes", "gauge", "What the frames in it take.", &State::used_bytes);
-    add("lookhaven_ring_readers", "gauge", "Viewers that read it.", &State::readers);
-    add("lookhaven_ring_dropped_frames_total", "counter", "Frames that had no room beside what viewers read.",
-        &State::entries_dropped);
+    add("lookhaven_ring_size_bytes", "gauge", "Capacity of the ring between the recorder and viewers.",
+        &State::arena_bytes);
+    add("lookhaven_ring_used_bytes", "gauge", "Bytes that its frames take.", &State::used_bytes);
+    add("lookhaven_ring_readers", "gauge", "Viewers that read the ring.", &State::readers);
+    add("lookhaven_ring_dropped_frames_total", "counter",
+        "Frames that had no room beside what viewers read, or came before a key frame.", &State::entries_dropped);
 }
 
 // "VEXO.Event/List": the API's name, and the method's where it is known.

@@ -100,11 +100,11 @@ void AddMounts(MetricsText& text, const base::Installation& installation, store:
             "counter");
     };
     using Counters = control::MountCounters;
-    counted("lookhaven_mount_retention_runs_total", "Searches for recordings to delete.", &Counters::retention_runs);
-    counted("lookhaven_mount_retention_failures_total", "Of these, those that failed.", &Counters::retention_failures);
-    counted("lookhaven_mount_deleted_events_total", "Recordings deleted by those that did not fail.",
+    counted("lookhaven_mount_retention_runs_total", "Retention runs.", &Counters::retention_runs);
+    counted("lookhaven_mount_retention_failures_total", "Retention runs that failed.", &Counters::retention_failures);
+    counted("lookhaven_mount_deleted_events_total", "Events deleted by retention runs that did not fail.",
             &Counters::deleted_events);
-    counted("lookhaven_mount_deleted_bytes_total", "What these took on the disk.", &Counters::deleted_bytes);
+    counted("lookhaven_mount_deleted_bytes_total", "Bytes of these events on the disk.", &Counters::deleted_bytes);
 }
 
 }  // namespace lookhaven::api

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/control/mount_counters.h"
 
-#include <algorithm>
-#include <array>
 #include <atomic>
 #include <filesystem>
+
+#include "standalone/control/counter_table.h"
 
 namespace lookhaven::control {
 
@@ -23,45 +23,32 @@ struct Row {
     std::atomic<std::uint64_t> retention_failures;
     std::atomic<std::uint64_t> deleted_events;
     std::atomic<std::uint64_t> deleted_bytes;
+
+    void Store(const MountCounters& from) {
+        mount = from.mount;
+        retention_runs = from.retention_runs;
+        retention_failures = from.retention_failures;
+        deleted_events = from.deleted_events;
+        deleted_bytes = from.deleted_bytes;
+    }
+
+    MountCounters Load() const { return {mount, retention_runs, retention_failures, deleted_events, deleted_bytes}; }
 };
 
 }  // namespace
 
-struct MountCountersWriter::Table {
-    std::atomic<std::uint64_t> version;
-    std::atomic<std::uint64_t> used;
-    std::array<Row, kMaxMounts> rows;
-};
+struct MountCountersWriter::Table : CounterTable<Row, kMaxMounts, kVersion> {};
 
 MountCountersWriter::MountCountersWriter(const base::Installation& installation)
-    : table_(MappedTable<Table>::Replace(PathOf(installation), [](Table& table) { table.version = kVersion; })) {}
+    : table_(Table::Replace<Table>(PathOf(installation))) {}
 
 void MountCountersWriter::Write(const std::vector<MountCounters>& mounts) {
-    const std::size_t count = std::min(mounts.size(), kMaxMounts);
-    for (std::size_t i = 0; i < count; ++i) {
-        Row& row = table_->rows[i];
-        row.mount = mounts[i].mount;
-        row.retention_runs = mounts[i].retention_runs;
-        row.retention_failures = mounts[i].retention_failures;
-        row.deleted_events = mounts[i].deleted_events;
-        row.deleted_bytes = mounts[i].deleted_bytes;
-    }
-    table_->used = count;
+    table_->Write(mounts);
 }
 
 std::vector<MountCounters> ReadMountCounters(const base::Installation& installation) {
-    const auto table = MappedTable<const MountCountersWriter::Table>::Open(PathOf(installation));
-    std::vector<MountCounters> mounts;
-    if (!table || (*table)->version != kVersion) {
-        return mounts;
-    }
-    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>((*table)->used, kMaxMounts));
-    for (std::size_t i = 0; i < count; ++i) {
-        const Row& row = (*table)->rows[i];
-        mounts.push_back(
-            {row.mount, row.retention_runs, row.retention_failures, row.deleted_events, row.deleted_bytes});
-    }
-    return mounts;
+    using Table = MountCountersWriter::Table;
+    return Table::Read<Table>(PathOf(installation)).value_or(std::vector<MountCounters>());
 }
 
 }  // namespace lookhaven::control

@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder counts of each mount's retention, for monitoring: a mapped file, as that of stream_counters.h.
-//
-// Invariants    (1) A row's numbers may be of two different seconds; each by itself is whole.
-//               (2) Counts begin at 0 with each start of the recorder.
+// What the recorder counts of each mount's retention, for monitoring, in a table as counter_table.h describes it.
+// Counts begin at 0 when the recorder is started, and where a mount is removed and added again.
 #pragma once
 
 #include <cstdint>
@@ -17,11 +15,9 @@ namespace lookhaven::control {
 struct MountCounters {
     int mount = 0;
     std::uint64_t retention_runs = 0;
-    std::uint64_t retention_failures = 0;  // of these
+    std::uint64_t retention_failures = 0;  // out of retention_runs
     std::uint64_t deleted_events = 0;
     std::uint64_t deleted_bytes = 0;
-
-    bool operator==(const MountCounters&) const = default;
 };
 
 // The recorder's side.

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/control/stream_counters.h"
 
-#include <algorithm>
-#include <array>
 #include <atomic>
 #include <filesystem>
+
+#include "standalone/control/counter_table.h"
 
 namespace lookhaven::control {
 
@@ -28,74 +28,58 @@ struct Row {
     std::atomic<bool> is_recorded;
     std::atomic<std::uint64_t> dropped_pictures;
     std::atomic<std::uint64_t> queued_bytes;
-    std::atomic<std::uint64_t> queue_bytes;
+    std::atomic<std::uint64_t> queue_capacity_bytes;
     std::atomic<std::int64_t> written_us;
     std::atomic<std::int64_t> stored_us;
+
+    void Store(const StreamCounters& from) {
+        stream = (std::int64_t{from.stream.camera} << 32) | static_cast<std::uint32_t>(from.stream.stream);
+        pictures = from.pictures;
+        bytes = from.bytes;
+        pictures_per_second = from.pictures_per_second;
+        bytes_per_second = from.bytes_per_second;
+        connections = from.connections;
+        last_picture_us = from.last_picture_us;
+        is_recorded = from.is_recorded;
+        dropped_pictures = from.dropped_pictures;
+        queued_bytes = from.queued_bytes;
+        queue_capacity_bytes = from.queue_capacity_bytes;
+        written_us = from.written_us;
+        stored_us = from.stored_us;
+    }
+
+    StreamCounters Load() const {
+        const std::int64_t both = stream;
+        return {.stream = {static_cast<std::int32_t>(both >> 32), static_cast<std::int32_t>(both)},
+                .pictures = pictures,
+                .bytes = bytes,
+                .pictures_per_second = pictures_per_second,
+                .bytes_per_second = bytes_per_second,
+                .connections = connections,
+                .last_picture_us = last_picture_us,
+                .is_recorded = is_recorded,
+                .dropped_pictures = dropped_pictures,
+                .queued_bytes = queued_bytes,
+                .queue_capacity_bytes = queue_capacity_bytes,
+                .written_us = written_us,
+                .stored_us = stored_us};
+    }
 };
-
-void Store(Row& row, const StreamCounters& from) {
-    row.stream = (std::int64_t{from.stream.camera} << 32) | static_cast<std::uint32_t>(from.stream.stream);
-    row.pictures = from.pictures;
-    row.bytes = from.bytes;
-    row.pictures_per_second = from.pictures_per_second;
-    row.bytes_per_second = from.bytes_per_second;
-    row.connections = from.connections;
-    row.last_picture_us = from.last_picture_us;
-    row.is_recorded = from.is_recorded;
-    row.dropped_pictures = from.dropped_pictures;
-    row.queued_bytes = from.queued_bytes;
-    row.queue_bytes = from.queue_bytes;
-    row.written_us = from.written_us;
-    row.stored_us = from.stored_us;
-}
-
-StreamCounters Load(const Row& row) {
-    const std::int64_t stream = row.stream;
-    return {.stream = {static_cast<std::int32_t>(stream >> 32), static_cast<std::int32_t>(stream)},
-            .pictures = row.pictures,
-            .bytes = row.bytes,
-            .pictures_per_second = row.pictures_per_second,
-            .bytes_per_second = row.bytes_per_second,
-            .connections = row.connections,
-            .last_picture_us = row.last_picture_us,
-            .is_recorded = row.is_recorded,
-            .dropped_pictures = row.dropped_pictures,
-            .queued_bytes = row.queued_bytes,
-            .queue_bytes = row.queue_bytes,
-            .written_us = row.written_us,
-            .stored_us = row.stored_us};
-}
 
 }  // namespace
 
-struct StreamCountersWriter::Table {
-    std::atomic<std::uint64_t> version;
-    std::atomic<std::uint64_t> used;
-    std::array<Row, kMaxStreams> rows;
-};
+struct StreamCountersWriter::Table : CounterTable<Row, kMaxStreams, kVersion> {};
 
 StreamCountersWriter::StreamCountersWriter(const base::Installation& installation)
-    : table_(MappedTable<Table>::Replace(PathOf(installation), [](Table& table) { table.version = kVersion; })) {}
+    : table_(Table::Replace<Table>(PathOf(installation))) {}
 
 void StreamCountersWriter::Write(const std::vector<StreamCounters>& streams) {
-    const std::size_t count = std::min(streams.size(), kMaxStreams);
-    for (std::size_t i = 0; i < count; ++i) {
-        Store(table_->rows[i], streams[i]);
-    }
-    table_->used = count;
+    table_->Write(streams);
 }
 
 std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation) {
-    const auto table = MappedTable<const StreamCountersWriter::Table>::Open(PathOf(installation));
-    if (!table || (*table)->version != kVersion) {
-        return std::nullopt;
-    }
-    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>((*table)->used, kMaxStreams));
-    std::vector<StreamCounters> streams;
-    streams.reserve(count);
-    std::transform((*table)->rows.begin(), (*table)->rows.begin() + static_cast<std::ptrdiff_t>(count),
-                   std::back_inserter(streams), Load);
-    return streams;
+    using Table = StreamCountersWriter::Table;
+    return Table::Read<Table>(PathOf(installation));
 }
 
 }  // namespace lookhaven::control

@@ -1,11 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the recorder counts of each stream that it runs, for monitoring.
-//
-// Why so        Numbers that change with every frame do not belong in a file that is replaced, nor in the store. So
-//               they lie in a mapped file, to which the recorder copies its counts every second.
-// Invariants    (1) A row's numbers may be of two different seconds; each by itself is whole.
-//               (2) Counts begin at 0 with each start of a stream.
+// What the recorder counts of each stream that it runs, for monitoring, in a table as counter_table.h describes it.
+// Counts begin at 0 with each start of a stream.
 #pragma once
 
 #include <cstdint>
@@ -30,11 +26,11 @@ struct StreamCounters {
 
     // These concern its recording, if it is recorded.
     bool is_recorded = false;
-    std::uint64_t dropped_pictures = 0;  // because the disk was too slow
-    std::uint64_t queued_bytes = 0;      // waiting for the disk …
-    std::uint64_t queue_bytes = 0;       // … of at most these
-    std::int64_t written_us = 0;         // up to when what had come is on the disk
-    std::int64_t stored_us = 0;          // when the store had the rows of all recordings
+    std::uint64_t dropped_pictures = 0;      // because the disk was too slow
+    std::uint64_t queued_bytes = 0;          // waiting for the disk
+    std::uint64_t queue_capacity_bytes = 0;  // the most that may wait
+    std::int64_t written_us = 0;             // up to when what had come is on the disk
+    std::int64_t stored_us = 0;              // when the store had the rows of all recordings
 
     bool operator==(const StreamCounters&) const = default;
 };

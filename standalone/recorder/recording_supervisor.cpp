@@ -205,7 +205,7 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
     counters.is_recorded = true;
     counters.dropped_pictures = queue->Dropped().frames;
     counters.queued_bytes = queue->QueuedBytes();
-    counters.queue_bytes = queue->CapacityBytes();
+    counters.queue_capacity_bytes = queue->CapacityBytes();
     counters.written_us = entries_.at(counters.stream.camera).worker->WrittenUs();
     counters.stored_us = rows_.StoredUs();
 }

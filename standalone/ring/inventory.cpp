@@ -68,7 +68,7 @@ bool RemoveDeadWriters(const Attachment& attachment) {
     return true;
 }
 
-// Of the entries in the index, which the writer changes meanwhile.
+// Approximate: the writer may change the index while it is read.
 std::uint64_t UsedBytes(const View& view) {
     std::uint64_t blocks = 0;
     for (std::uint32_t i = 0; i < view.Constants().index_slots; ++i) {

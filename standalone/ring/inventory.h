@@ -23,8 +23,8 @@ struct SegmentState {
     std::int64_t heartbeat_age_ms = 0;
     std::uint64_t entries_written = 0;
     std::uint64_t entries_dropped = 0;
-    std::uint64_t arena_bytes = 0;  // for entries …
-    std::uint64_t used_bytes = 0;   // … and what those take that a reader finds
+    std::uint64_t arena_bytes = 0;  // space for entries
+    std::uint64_t used_bytes = 0;   // taken by the entries that readers can still find
     std::uint32_t readers = 0;
 };
 
