@@ -18,10 +18,6 @@ constexpr std::size_t kIdsPerCamera = 4;
 // From a frame's capture until its row is Put: on its way from the camera a second, in the file's buffers half a
 // second.
 constexpr std::int64_t kMaxDelayS = 3;
-// A mark that becomes known so long after its end may still have footage in memory. From when a mark becomes known its
-// camera is recorded for so long at least: the camera's thread is told up to a second later, and may have to try again.
-constexpr std::int64_t kMaxLateMarkS = 10;
-constexpr std::int64_t kLateRecordingS = 4;
 
 }  // namespace
 
@@ -92,7 +88,7 @@ bool EventRowQueue::HasStored(int camera, std::int64_t until_s) const {
     return stored != stored_until_s_.end() && stored->second >= until_s;
 }
 
-std::map<int, PendingMark> EventRowQueue::PendingMarks() const {
+PendingMarks EventRowQueue::Pending() const {
     const std::lock_guard lock(mutex_);
     return pending_marks_;
 }
@@ -145,8 +141,10 @@ void EventRowQueue::Work(store::Store& store) {
     } else if (HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
         FillReserve(store);
     }
-    NotePending(store::Marks(store).Pending());
+    // Made and freed without the lock, for which cameras wait.
+    PendingMarks pending = UpdatePendingMarks(store::Marks(store).Pending(), pending_marks_, base::WallSeconds());
     const std::lock_guard lock(mutex_);
+    pending_marks_.swap(pending);
     if (is_all_stored) {
         stored_until_s_ = std::move(written_until_s);
         stored_s_ = now_s - kMaxDelayS;
@@ -198,23 +196,6 @@ void EventRowQueue::FillReserve(store::Store& store) {
     for (int id = first; id < first + count; ++id) {
         reserve_.push_back(id);
     }
-}
-
-void EventRowQueue::NotePending(std::vector<store::Mark> marks) {
-    const std::int64_t now_s = base::WallSeconds();
-    const std::lock_guard lock(mutex_);
-    std::map<int, PendingMark> pending;
-    for (store::Mark& mark : marks) {
-        const auto known = pending_marks_.find(mark.id);
-        const bool may_be_buffered = now_s < mark.end_s + kMaxLateMarkS;
-        const std::int64_t until_s = known != pending_marks_.end() ? known->second.record_until_s
-                                     : may_be_buffered             ? std::max(mark.end_s, now_s + kLateRecordingS)
-                                                                   : mark.end_s;
-        PendingMark& entry = pending[mark.id];
-        entry.mark = std::move(mark);
-        entry.record_until_s = until_s;
-    }
-    pending_marks_ = std::move(pending);
 }
 
 void EventRowQueue::StoreGrowth(store::Events& events, const std::vector<store::Event>& grown) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Event rows on their way to the store, and event ids fetched in advance.
+// Event rows on their way to the store, and what is fetched from it in advance: event ids and pending marks.
 //
 // Why so        No frame may be lost because the store is unavailable or hangs. So rows wait here, the newest state of
 //               each, and ids for future events are kept in reserve.
@@ -17,19 +17,13 @@
 #include <string>
 #include <vector>
 
+#include "standalone/recorder/pending_marks.h"
 #include "standalone/recorder/recorder_lease_keeper.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/events.h"
 #include "standalone/store/marks.h"
 
 namespace lookhaven::recorder {
-
-struct PendingMark {
-    store::Mark mark;
-    // Until when its camera is recorded for it, in UTC seconds: its end, or some seconds after it became known where that
-    // was late. Earlier frames are recorded as far as the pre-record buffer still has them.
-    std::int64_t record_until_s = 0;
-};
 
 class EventRowQueue {
   public:
@@ -61,9 +55,9 @@ class EventRowQueue {
     // When all rows that had been Put were in the store, in monotonic microseconds; at first when this queue began.
     std::int64_t StoredUs() const { return stored_us_; }
 
-    // The marks whose footage is still to come, by id, as of the last refresh.
-    std::map<int, PendingMark> PendingMarks() const;
-    // Of one of them; nothing where it is not known.
+    // As of the last refresh.
+    PendingMarks Pending() const;
+    // The pending mark with that id, if any.
     std::optional<PendingMark> FindPendingMark(int id) const;
     // Ids from this one on belong to this recorder or to nobody yet; nothing until the store was reached once.
     std::optional<int> FirstReservedId() const;
@@ -86,14 +80,13 @@ class EventRowQueue {
     void FillReserve(store::Store& store);
     void StoreGrowth(store::Events& events, const std::vector<store::Event>& grown);
     bool StoreRow(store::Events& events, int id);
-    void NotePending(std::vector<store::Mark> marks);
 
     mutable std::mutex mutex_;
     std::map<int, Entry> entries_;
     std::deque<int> reserve_;
     std::optional<int> first_reserved_id_;
     std::size_t wanted_reserve_ = 0;
-    std::map<int, PendingMark> pending_marks_;
+    PendingMarks pending_marks_;                   // only the thread changes it
     std::map<int, std::int64_t> written_until_s_;  // of the cameras that are recorded
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;

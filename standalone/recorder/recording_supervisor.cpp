@@ -67,12 +67,15 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
     std::map<int, std::int64_t> until_s;
     const std::int64_t now_s = base::WallSeconds();
-    for (const auto& [id, pending] : rows_.PendingMarks()) {
+    for (const auto& [id, pending] : rows_.Pending()) {
         const store::Mark& mark = pending.mark;
         const auto plan = catalog.cameras.find(mark.camera_id);
-        if (plan != catalog.cameras.end() && mark.start_s <= now_s && now_s < pending.record_until_s &&
+        // Without a pre-record buffer nothing is left of what is over.
+        const bool has_buffer = plan != catalog.cameras.end() && plan->second.pre_s > 0;
+        const std::int64_t end_s = has_buffer ? pending.record_until_s : mark.end_s;
+        if (plan != catalog.cameras.end() && mark.start_s <= now_s && now_s < end_s &&
             TakesMarkAt(plan->second, mark.moment_s)) {
-            until_s[mark.camera_id] = std::max(until_s[mark.camera_id], pending.record_until_s);
+            until_s[mark.camera_id] = std::max(until_s[mark.camera_id], end_s);
         }
     }
     return until_s;
