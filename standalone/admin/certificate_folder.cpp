@@ -27,18 +27,21 @@ void Sync(const std::filesystem::path& folder) {
     }
 }
 
-// A link, or a copy of what only its owner may link.
-void Carry(const std::filesystem::path& file, const std::filesystem::path& folder) {
+// Where the kernel lets only its owner link a file (fs.protected_hardlinks), it is copied.
+void LinkOrCopy(const std::filesystem::path& file, const std::filesystem::path& folder) try {
     namespace fs = std::filesystem;
-    const fs::path carried = folder / file.filename();
+    const fs::path target = folder / file.filename();
     std::error_code refused;
-    fs::create_hard_link(file, carried, refused);
+    fs::create_hard_link(file, target, refused);
     if (refused) {
-        fs::copy_file(file, carried, refused);
+        const fs::perms permissions = fs::status(file).permissions() & static_cast<fs::perms>(0644);
+        base::WriteFileAtomically(target, base::ReadFile(file), static_cast<unsigned int>(permissions));
     }
-    if (refused) {
-        throw store::InvalidRecord(file.string() + " cannot be copied (" + refused.message() + "): move it elsewhere");
+} catch (const std::system_error& error) {
+    if (error.code() != std::errc::permission_denied) {
+        throw;
     }
+    throw store::InvalidRecord(file.string() + " cannot be read: move it elsewhere first");
 }
 
 }  // namespace
@@ -94,7 +97,7 @@ void CertificateFolder::Prepare(const std::string& certificates, const std::stri
             throw store::InvalidRecord("the folder " + used_.string() + " holds another folder, " + name.string() +
                                        ": move that elsewhere first");
         } else {
-            Carry(entry.path(), other_);
+            LinkOrCopy(entry.path(), other_);
         }
     }
     base::WriteFileAtomically(other_ / kKey, key);
