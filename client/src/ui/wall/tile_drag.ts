@@ -36,7 +36,8 @@ export function dragToOrder(grid: HTMLElement, moved: () => void): void {
       if (tiles.indexOf(over) > tiles.indexOf(tile)) over.after(tile);
       else over.before(tile);
     };
-    const drop = () => {
+    const drop = (event?: Event) => {
+      if (event instanceof PointerEvent && event.pointerId !== pressed.pointerId) return;
       end.abort();
       clearTimeout(pressing);
       if (!tile.classList.contains("is-dragged")) return;
