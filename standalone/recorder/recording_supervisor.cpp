@@ -284,8 +284,7 @@ bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
     return camera_leases_ && camera_leases_->IsHeldElsewhere(camera);
 }
 
-// A thread that cannot be started affects that camera or mount alone, and is tried again. Logged once for each
-// reason.
+// A thread that cannot be started affects that camera or mount alone, and is retried. Each reason is logged once.
 template <class Work>
 void RecordingSupervisor::Start(const std::string& what, Work&& start) {
     try {

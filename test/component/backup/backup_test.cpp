@@ -49,15 +49,15 @@ class BackupTest : public testing::Test {
     const base::Installation new_ = SetUpHome(folder_ / "new");
 };
 
-TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
+TEST_F(BackupTest, BringsWhatTheStoreHoldsMapsAndTheCertificateToAnotherMachine) {
     std::string image;
     std::string secret;
+    int yard = 0;
     const std::string of_other_host = "1-0123456789abcdef.svg";
     {
         store::Store store = store::Store::Open(old_.StoreUrl());
         store::Users(store).Add("bob", "correct horse", store::Privilege::kOwner);
-        const int yard =
-            store::Cameras(store).Add({.name = "Yard", .profiles = {{.source = "test:mjpeg"}}, .max_age_s = 86400});
+        yard = store::Cameras(store).Add({.name = "Yard", .profiles = {{.source = "test:mjpeg"}}, .max_age_s = 86400});
         secret = store::AccessTokens(store)
                      .Add({.name = "Till", .camera_ids = {yard}, .may_pos = true, .creator = "bob"})
                      .secret;
@@ -89,7 +89,9 @@ TEST_F(BackupTest, BringsAccountsMapsAndTheCertificateToAnotherMachine) {
     store::Store store = store::Store::Open(new_.StoreUrl());
     EXPECT_TRUE(store::Users(store).CheckPassword("bob", "correct horse"));
     EXPECT_EQ(store::Cameras(store).List().at(0).max_age_s, 86400);
-    EXPECT_EQ(store::AccessTokens(store).FindBySecret(secret).value_or(store::AccessToken()).camera_ids, std::set{1});
+    const auto token = store::AccessTokens(store).FindBySecret(secret);
+    ASSERT_TRUE(token);
+    EXPECT_EQ(token->camera_ids, std::set{yard});
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(image), "<svg/>");
     EXPECT_EQ(emap::Pictures(store, new_.Home()).Read(of_other_host), "<svg>2</svg>");
     EXPECT_FALSE(store::EmapPictures(store).Find(of_other_host)) << "once is enough";

@@ -118,15 +118,34 @@ TEST_F(MountMaintenanceTest, DeletesByAgeOnlyOnceTheClockHasRunForAnHourWithoutA
         {"an hour after the last", 3000, 0, true},
         {"put right by a minute", 20, 60, true},
     };
+    std::uint64_t deleted = 0;
     for (const auto& row : rows) {
         const int old = footage_.Record(1, kNoon, 60);
         Pass(row.after_s, row.step_s);
         EXPECT_EQ(!Has(old), row.is_deleted) << row.what;
+        deleted += row.is_deleted ? 1 : 0;
+        EXPECT_EQ(maintenance_->Counters().deleted_events, deleted) << row.what;
         if (Has(old)) {
             store::Events(footage_.Records()).Remove(std::array{old});
             fs::remove_all(footage_.Mount() / "1");
         }
     }
+}
+
+TEST_F(MountMaintenanceTest, CountsTheRetentionRunsThatFail) {
+    Change([](store::Mount& mount) { mount.max_age_s = 3 * 86'400; });
+    Start();
+    Pass(20, 400 * 86'400);
+    Pass(3600);
+    const control::MountCounters before = maintenance_->Counters();
+    const fs::path file =
+        footage_.Mount() / store::Events(footage_.Records()).Find(footage_.Record(1, kNoon, 60))->path;
+    fs::remove(file);
+    fs::create_directories(file / "not-empty");
+    Pass(20);
+    EXPECT_EQ(maintenance_->Counters().retention_failures, before.retention_failures + 1);
+    EXPECT_GT(maintenance_->Counters().retention_runs, before.retention_runs);
+    EXPECT_EQ(State(), MountState::kFailing);
 }
 
 TEST_F(MountMaintenanceTest, RecoversUntilItIsCompleteAndAgainWhatIsMountedLater) {
