@@ -47,8 +47,8 @@ void MountCountersWriter::Write(const std::vector<MountCounters>& mounts) {
 }
 
 std::vector<MountCounters> ReadMountCounters(const base::Installation& installation) {
-    using Table = MountCountersWriter::Table;
-    return Table::Read<Table>(PathOf(installation)).value_or(std::vector<MountCounters>());
+    return MountCountersWriter::Table::Read<MountCountersWriter::Table>(PathOf(installation))
+        .value_or(std::vector<MountCounters>());
 }
 
 }  // namespace lookhaven::control

@@ -78,8 +78,7 @@ void StreamCountersWriter::Write(const std::vector<StreamCounters>& streams) {
 }
 
 std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation) {
-    using Table = StreamCountersWriter::Table;
-    return Table::Read<Table>(PathOf(installation));
+    return StreamCountersWriter::Table::Read<StreamCountersWriter::Table>(PathOf(installation));
 }
 
 }  // namespace lookhaven::control
