@@ -39,6 +39,7 @@ Json::Value MountRecord(const store::Mount& mount) {
     json["path"] = mount.path;
     json["enabled"] = mount.enabled;
     json["default"] = mount.is_default;
+    json["shared"] = mount.IsShared();
     json["limit"]["bytes"] = mount.max_bytes > 0 ? Json::Value(Json::Int64{mount.max_bytes}) : Json::Value();
     json["limit"]["days"] = DaysJson(mount.max_age_s);
     json["revision"] = Json::Int64{RevisionOf(json)};
@@ -47,7 +48,10 @@ Json::Value MountRecord(const store::Mount& mount) {
 
 store::Mount AddMount(store::Store& store, const Actor& actor, const MountChange& change) {
     store::Mount mount;
-    mount.host_id = change.own_host;
+    if (change.is_shared && change.own_host == 0) {
+        throw store::InvalidRecord("only hosts that have one store in PostgreSQL share mounts: see lookhaven host add");
+    }
+    mount.host_id = change.is_shared ? store::kAllHosts : change.own_host;
     change.ApplyTo(mount);
     RequireFreeFolder(store, mount.path, 0, change.take_over);
     if (mount.name.empty()) {

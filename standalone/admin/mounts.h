@@ -28,6 +28,7 @@ struct MountChange {
     std::optional<bool> enabled = {};
     bool is_default = false;  // can be set, not cleared
     int own_host = 0;         // the machine's own: OwnHost of hosts.h
+    bool is_shared = false;   // by all hosts; of a new mount
     bool take_over = false;   // also a folder that is another mount's
     bool confirmed = false;   // also where a lower limit deletes recordings
 
@@ -35,8 +36,8 @@ struct MountChange {
     void ApplyTo(store::Mount& mount) const;
 };
 
-// {"id", "name", "path", "enabled", "default", "limit": {"bytes", "days"}, "revision"}; a limit is null where there is
-// none.
+// {"id", "name", "path", "enabled", "default", "shared", "limit": {"bytes", "days"}, "revision"}; a limit is null where
+// there is none.
 Json::Value MountRecord(const store::Mount& mount);
 
 // These two return the record as it is then. The folder is marked as the mount's.

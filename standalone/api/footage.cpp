@@ -14,8 +14,8 @@ namespace lookhaven::api {
 namespace {
 
 Footage Of(const store::Event& event) {
-    return {event.id,      std::nullopt, event.camera_id, event.mount_id,
-            event.start_s, event.end_s,  event.recording, event.path};
+    return {event.id,    std::nullopt,    event.camera_id, event.mount_id, event.start_s,
+            event.end_s, event.recording, event.path,      event.host_id};
 }
 
 Footage Require(const Call& call, std::optional<Footage> footage, store::CameraAccess access) {

@@ -17,6 +17,7 @@
 #include "standalone/store/cameras.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::api {
 
@@ -76,7 +77,9 @@ void CheckCameras(store::Store& records, int host, const std::vector<control::St
 std::optional<std::string> ProblemOf(store::Store& records, const store::Mount& mount) {
     const auto folder = maintenance::OpenMount(records, mount);
     if (!folder) {
-        return "its disk is not mounted";
+        // A host may do without a shared mount that others have.
+        const bool is_elsewhere = mount.IsShared() && !store::SharedMounts(records).HostsWith(mount.id).empty();
+        return is_elsewhere ? std::nullopt : std::optional<std::string>("its disk is not mounted");
     }
     const maintenance::MountSpace space = folder->Space();
     if (space.free_bytes < space.ReserveBytes() || space.free_files < space.ReserveFiles()) {
@@ -98,7 +101,9 @@ void CheckMounts(const base::Installation& installation, store::Store& records, 
             problem = error.what();
         }
         for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
-            if (!problem && status.mount == mount.id && status.state != maintenance::MountState::kReady) {
+            const bool is_well = status.state == maintenance::MountState::kReady ||
+                                 (mount.IsShared() && status.state == maintenance::MountState::kNotMounted);
+            if (!problem && status.mount == mount.id && !is_well) {
                 problem = std::string(maintenance::NameOf(status.state)) + ' ' + status.reason;
             }
         }

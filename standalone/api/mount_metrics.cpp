@@ -13,6 +13,7 @@
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::api {
 
@@ -53,6 +54,8 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
                 const auto state = states.find(mount.id);
                 figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady ||
                                 state->second == maintenance::MountState::kKeptFull;
+            } else if (mount.IsShared() && !store::SharedMounts(records).HostsWith(mount.id).empty()) {
+                mounts.pop_back();  // a host may do without one that others have
             }
         } catch (const std::system_error&) {
             figures.is_up = false;  // and why, the health says

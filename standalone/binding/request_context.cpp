@@ -125,7 +125,7 @@ const store::Mount* RequestContext::MountOf(int camera_id) {
             return &mount;
         }
         // Its own comes before one that all hosts share.
-        if (mount.is_default && may_have && (found == nullptr || found->host_id == 0)) {
+        if (mount.is_default && may_have && (found == nullptr || found->IsShared())) {
             found = &mount;
         }
     }

@@ -30,13 +30,14 @@ struct Request {
     std::optional<bool> enabled;
     bool make_default = false;
     bool take_over = false;
+    bool is_shared = false;
     bool forget = false;
     bool yes = false;
 };
 
 Json::Value ToData(const Mount& mount) {
     return Object("id", mount.id, "name", mount.name, "path", mount.path, "max_bytes", mount.max_bytes, "max_age",
-                  mount.max_age_s, "enabled", mount.enabled, "default", mount.is_default);
+                  mount.max_age_s, "enabled", mount.enabled, "default", mount.is_default, "shared", mount.IsShared());
 }
 
 std::string LimitText(const Json::Value& bytes) {
@@ -50,7 +51,8 @@ std::string FreeText(const Json::Value& mount) {
 }
 
 std::string StateText(const Json::Value& mount) {
-    return std::string(mount["default"].asBool() ? "default" : "") + (mount["enabled"].asBool() ? "" : " disabled");
+    return std::string(mount["default"].asBool() ? "default" : "") + (mount["shared"].asBool() ? " shared" : "") +
+           (mount["enabled"].asBool() ? "" : " disabled");
 }
 
 constexpr Column kColumns[] = {
@@ -77,6 +79,7 @@ admin::MountChange ChangeOf(const Console& console, store::Store& store, const R
     }
     change.own_host = admin::OwnHost(store, console.Installation());
     change.is_default = request.make_default;
+    change.is_shared = request.is_shared;
     change.take_over = request.take_over;
     change.confirmed = request.yes;
     return change;
@@ -154,7 +157,9 @@ void AddMount(CLI::App& program, const Console& console) {
             .Flag("--take-over", request.take_over, "Also take a folder that belongs to another mount or installation")
             .Switch("--enable,!--disable", request.enabled, "Whether recordings are written to it");
     };
-    Command add = group.Add("add", "Adds an existing folder", Add).Option("path", request.path, "The folder", Required);
+    Command add = group.Add("add", "Adds an existing folder", Add)
+                      .Option("path", request.path, "The folder", Required)
+                      .Flag("--shared", request.is_shared, "All hosts may mount it, at this path");
     add_properties(add);
     Command set = group.Add("set", "Changes the given properties of a mount", Change)
                       .Option("id", request.id, "The mount's id", Required)

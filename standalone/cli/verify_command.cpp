@@ -17,6 +17,7 @@
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/mounts.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::cli {
 
@@ -43,7 +44,7 @@ std::map<int, std::string> RequireOwnMounts(store::Store& store, const base::Ins
             return status.mount == mount.id && status.state == maintenance::MountState::kInUse;
         });
         try {
-            if (maintenance::OpenMount(store, mount) && (is_refused || !is_running) &&
+            if (!mount.IsShared() && maintenance::OpenMount(store, mount) && (is_refused || !is_running) &&
                 maintenance::MountLock::IsHeld(mount.path)) {
                 throw Failure(kDataError, "the recorder of another state folder uses the mount at ", mount.path);
             }
@@ -62,11 +63,16 @@ void Verify(const Console& console, const Request& request) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
         if (!mount.IsOf(host)) {
             left_alone[mount.id] = "";
+        } else if (const int keeper = store::SharedMounts(store).Keeper(mount.id);
+                   request.repair && mount.IsShared() && keeper != 0 && keeper != host) {
+            const auto name = store::Hosts(store).Find(keeper);
+            left_alone[mount.id] = "it is repaired on the host that maintains it" + (name ? ", " + name->name : "");
         }
     }
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;
-    const maintenance::VerifyReport report = maintenance::Verify(
-        store, request.repair, watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>(), left_alone);
+    const maintenance::VerifyReport report =
+        maintenance::Verify(store, request.repair,
+                            watched ? ShowProgress : std::function<void(std::size_t, std::size_t)>(), left_alone, host);
     Json::Value faults = Json::arrayValue;
     std::string text;
     std::size_t left = 0;

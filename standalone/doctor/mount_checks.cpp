@@ -21,6 +21,7 @@
 #include "standalone/store/kept_events.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::doctor {
 
@@ -80,7 +81,17 @@ bool IsReadable(const store::Mount& mount) {
     return ::access(mount.path.c_str(), R_OK | X_OK) == 0 && (::access(marker.c_str(), R_OK) == 0 || errno == ENOENT);
 }
 
+bool IsElsewhere(store::Store& store, const store::Mount& mount) {
+    return !store::SharedMounts(store).HostsWith(mount.id).empty() && !maintenance::OpenMount(store, mount);
+}
+
 Findings CheckEnabled(store::Store& store, const store::Mount& mount) {
+    if (mount.IsShared() && IsElsewhere(store, mount)) {
+        return {{Concat("the folder of ", TitleOf(mount),
+                        ", which hosts share, is not there: this host does not record"
+                        " to it, and fetches what is on it from others"),
+                 "mount it at that path, as the others have it, or leave it as it is", Severity::kNote}};
+    }
     if (::access(mount.path.c_str(), F_OK) != 0) {
         return {{TitleOf(mount) + " is not there",
                  Concat("mount its disk, or, where its folder has moved: lookhaven mount set ", mount.id,

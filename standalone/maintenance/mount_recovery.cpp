@@ -1,13 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/maintenance/mount_recovery.h"
 
+#include <algorithm>
 #include <optional>
+#include <set>
 #include <string>
+#include <vector>
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/recording_recovery.h"
+#include "standalone/store/hosts.h"
 
 namespace lookhaven::maintenance {
 
@@ -35,16 +39,52 @@ bool Try(Work&& work) {
     }
 }
 
-bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, int first_reserved_id,
+// Whose recordings are recovered here.
+class Responsibility {
+  public:
+    Responsibility(store::Store& store, const store::Mount& mount, int first_reserved_id, const HostShare& share)
+        : is_shared_(mount.IsShared()),
+          first_reserved_id_(first_reserved_id),
+          share_(share) {
+        if (is_shared_) {
+            blocks_ = store::Events(store).ReservedBlocks();
+            for (const store::Host& host : store::Hosts(store).All()) {
+                hosts_.insert(host.id);
+            }
+        }
+    }
+
+    bool IsOverdue(const store::Event& row) const { return MayHave(row.host_id, row.id); }
+
+    // Of a shared mount only what is known to be of a host: a file without a row may be of one that is away.
+    bool IsOverdue(const archive::FileName& file) const {
+        const auto block = std::ranges::find_if(blocks_, [&](const auto& each) { return each.Has(file.event); });
+        return is_shared_ ? block != blocks_.end() && MayHave(block->host_id, file.event)
+                          : file.event < first_reserved_id_;
+    }
+
+  private:
+    bool MayHave(int host, int event) const {
+        return !is_shared_ || host == share_.host ? event < first_reserved_id_
+                                                  : share_.is_keeper && !hosts_.contains(host);
+    }
+
+    const bool is_shared_;
+    const int first_reserved_id_;
+    const HostShare share_;
+    std::vector<store::EventIdBlock> blocks_;
+    std::set<int> hosts_;  // that there are
+};
+
+bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, const Responsibility& own,
                   std::int64_t now_s) {
     bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
-        if (file.name.kind == archive::FileKind::kRecording && file.name.event < first_reserved_id &&
+        if (file.name.kind == archive::FileKind::kRecording && own.IsOverdue(file.name) &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
             is_complete &= Try([&] {
                 const int new_id = events.NextId();
-                return ImportRecording(events, mount, mount_id, file.name, new_id,
-                                       std::min(first_reserved_id, new_id + 1));
+                return ImportRecording(events, mount, mount_id, file.name, new_id, new_id + 1);
             });
         }
     }
@@ -53,22 +93,26 @@ bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id,
 
 }  // namespace
 
-bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s) {
+bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s,
+             const HostShare& share) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
     if (!folder) {
         return false;
     }
-    Deletion(store, mount, *folder, now_s).Finish();
+    if (!mount.IsShared() || share.is_keeper) {
+        Deletion(store, mount, *folder, now_s).Finish();
+    }
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
     bool is_complete = true;
     store::Events events(store);
     events.SetMissingOrders(mount.id);
+    const Responsibility own(store, mount, first_reserved_id, share);
     for (const store::Event& row : events.Open()) {
-        if (row.mount_id == mount.id && row.id < first_reserved_id && !row.demo) {
+        if (row.mount_id == mount.id && own.IsOverdue(row) && !row.demo) {
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    return ImportRecent(events, *folder, mount.id, first_reserved_id, now_s) && is_complete;
+    return ImportRecent(events, *folder, mount.id, own, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

@@ -10,11 +10,22 @@
 
 namespace lookhaven::maintenance {
 
+// What a host has to do with a shared mount; of no account for any other.
+struct HostShare {
+    int host = 0;
+    bool is_keeper = false;  // as in store/shared_mounts.h
+};
+
 // Finishes deletions, closes the mount's open events after their last good frame, removes rows whose file is missing,
 // and imports recordings of today and yesterday that never got a row. Ignores ids from first_reserved_id on: the caller
 // is recording them. Logs what it did; what is wrong with one file is logged and does not affect the others. False when
 // there was something or the mount is not mounted: try again later. Throws store::StoreError, and std::system_error
 // where the disk fails, which ends the pass: the files after it are as they were.
-bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s);
+//
+// Of a shared mount each host recovers what it has recorded itself: whether another one is still writing cannot be told
+// by what its files look like from here. The mount's keeper also recovers what hosts have recorded that were removed,
+// and finishes deletions.
+bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s,
+             const HostShare& share = {});
 
 }  // namespace lookhaven::maintenance

@@ -15,6 +15,7 @@
 #include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/marks.h"
 #include "standalone/maintenance/recording_recovery.h"
+#include "standalone/store/hosts.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
 
@@ -28,12 +29,13 @@ constexpr std::int64_t kMinAgeS = 10;
 class Verification {
   public:
     Verification(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
-                 const std::map<int, std::string>& left_alone)
+                 const std::map<int, std::string>& left_alone, int host)
         : store_(store),
           events_(store),
           repair_(repair),
           progress_(progress),
           left_alone_(left_alone),
+          host_(host),
           next_id_(repair ? events_.NextId() : std::numeric_limits<int>::max()) {}
 
     VerifyReport Run() {
@@ -102,7 +104,15 @@ class Verification {
         }
     }
 
+    // Its lock on the file may not be seen here.
+    bool IsWrittenElsewhere(const store::Event& row) {
+        return row.recording && row.host_id != 0 && row.host_id != host_ && store::Hosts(store_).Find(row.host_id);
+    }
+
     void CheckRow(const MountFolder& mount, const store::Event& row) {
+        if (IsWrittenElsewhere(row)) {
+            return;
+        }
         const std::string path = (mount.Path() / row.path).string();
         const std::optional<archive::FileName> name = archive::ParsePath(row.path);
         if (!name || name->event != row.id || name->kind != archive::FileKind::kRecording) {
@@ -264,6 +274,7 @@ class Verification {
     const bool repair_;
     const std::function<void(std::size_t, std::size_t)>& progress_;
     const std::map<int, std::string>& left_alone_;
+    const int host_;
     const int next_id_;
     // Given out once the mount's files were listed. While the store is out of a recorder's reach, the rows of its
     // finished files wait in its memory: those among them have lower ids, and a file with a higher one is of an earlier
@@ -275,8 +286,8 @@ class Verification {
 }  // namespace
 
 VerifyReport Verify(store::Store& store, bool repair, const std::function<void(std::size_t, std::size_t)>& progress,
-                    const std::map<int, std::string>& left_alone) {
-    return Verification(store, repair, progress, left_alone).Run();
+                    const std::map<int, std::string>& left_alone, int host) {
+    return Verification(store, repair, progress, left_alone, host).Run();
 }
 
 }  // namespace lookhaven::maintenance

@@ -16,20 +16,23 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
     const auto found = plans.find(camera.id);
     const store::RecordingPlan plan = found == plans.end() ? store::NoPlan() : found->second;
     const bool has_profile = found != plans.end() && camera.FindProfile(plan.profile) != nullptr;
-    CameraPlan result{camera.name,
-                      plan.mode,
-                      plan.segment_s,
-                      plan.pre_s,
-                      has_profile ? plan.profile : camera.live_profile,
-                      0,
-                      {},
-                      {},
-                      camera.live_profile,
-                      camera.video_type,
-                      plan.hours};
+    CameraPlan result;
+    result.camera_name = camera.name;
+    result.mode = plan.mode;
+    result.segment_s = plan.segment_s;
+    result.pre_s = plan.pre_s;
+    result.stream = has_profile ? plan.profile : camera.live_profile;
+    result.live_profile = camera.live_profile;
+    result.video_type = camera.video_type;
+    result.hours = plan.hours;
     if (const std::optional<store::Mount> mount = mounts.FindForPlan(plan.mount_id, host); mount && mount->enabled) {
         result.mount_id = mount->id;
         result.mount = mount->path;
+        const auto own = mount->IsShared() ? mounts.FindForPlan(0, host) : std::nullopt;
+        if (own && own->enabled && !own->IsShared()) {
+            result.own_mount_id = own->id;
+            result.own_mount = own->path;
+        }
     }
     return result;
 }

@@ -23,6 +23,7 @@ constexpr std::int64_t kMaxDelayS = 3;
 
 EventRowQueue::EventRowQueue(const std::string& store_url, const std::string& recorder, int host, LeaseTimes times)
     : stored_us_(base::MonotonicMicros()),
+      host_(host),
       lease_(recorder, base::MonotonicMicros, host, times),
       thread_(store_url, "store the events, recording continues",
               [this](store::Store& store, const std::stop_token&) { Work(store); }) {}
@@ -48,6 +49,7 @@ void EventRowQueue::Put(const store::Event& row) {
         const std::lock_guard lock(mutex_);
         const auto [entry, is_new] = entries_.try_emplace(row.id);
         entry->second.row = row;
+        entry->second.row.host_id = host_;
         entry->second.is_dirty = true;
         is_urgent = is_urgent || is_new;
     }
@@ -186,7 +188,8 @@ void EventRowQueue::FillReserve(store::Store& store) {
         return;
     }
     const int count = static_cast<int>(std::max<std::size_t>(missing, 1));
-    const int first = store::Events(store).NextIds(count);
+    const int first = host_ == 0 ? store::Events(store).NextIds(count)
+                                 : store::Events(store).ReserveIds(count, host_, base::WallSeconds());
     // Told before the first of them is used: verify leaves files with these ids alone.
     if (is_first && !HoldLease(store, first)) {
         return;

@@ -91,6 +91,7 @@ class EventRowQueue {
     std::map<int, std::int64_t> stored_until_s_;   // the same when the rows were stored last, at stored_s_
     std::int64_t stored_s_ = 0;
     std::atomic<std::int64_t> stored_us_;
+    const int host_;
     RecorderLeaseKeeper lease_;       // only the thread uses it
     bool is_growth_refused_ = false;  // only the thread uses it
     std::atomic<bool> is_refused_ = false;

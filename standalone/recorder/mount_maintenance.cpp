@@ -2,14 +2,17 @@
 #include "standalone/recorder/mount_maintenance.h"
 
 #include <algorithm>
+#include <iterator>
 #include <system_error>
 #include <utility>
+#include <vector>
 
 #include "standalone/base/log.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_recovery.h"
 #include "standalone/store/footage_removals.h"
 #include "standalone/store/kept_events.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::recorder {
 
@@ -26,6 +29,7 @@ constexpr std::int64_t kMaxPauseUs = 600'000'000;
 MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, bool is_space_held)
     : mount_id_(mount_id),
       context_(std::move(context)),
+      watch_(context_.offline_us),
       disk_watch_{maintenance::SpaceWatch(is_space_held), maintenance::SpaceWatch(is_space_held)},
       status_{mount_id, is_space_held ? MountState::kSpaceHeld : MountState::kReady, ""},
       counters_{.mount = mount_id},
@@ -53,6 +57,7 @@ void MountMaintenance::Work(store::Store& store) {
     const Clock clock{now_s, clock_watch_.IsTrusted(now_us, now_s)};
     // Without ids of its own the recorder could not tell its events from those of another one.
     if (!context_.first_reserved_id()) {
+        must_recover_ = true;
         is_recovered_ = false;
         return;
     }
@@ -70,36 +75,39 @@ void MountMaintenance::Work(store::Store& store) {
     } catch (const std::exception& failure) {
         after_failure_.Begin(now_us);
         SetStatus(MountState::kFailing, failure.what());
+        // The folder may fail on this host alone.
+        if (std::exchange(is_keeper_, false)) {
+            store::SharedMounts(store).Release(mount_id_, context_.host);
+        }
     }
 }
 
 void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, const Clock& clock) {
-    if (!maintenance::OpenMount(store, mount)) {
+    const bool is_there = maintenance::OpenMount(store, mount).has_value();
+    if (mount.IsShared()) {
+        store::SharedMounts(store).NotePresence(mount.id, context_.host, is_there);
+    }
+    if (!is_there) {
         SetStatus(MountState::kNotMounted, mount.path);
-        is_recovered_ = false;  // whatever is mounted later
+        must_recover_ = true;  // whatever is mounted later
+        is_recovered_ = mount.IsShared();
+        is_keeper_ = false;
         lock_.Release();
         return;
     }
-    if (!lock_.Hold(mount.path)) {
+    if (!MayMaintain(store, mount)) {
         SetStatus(MountState::kInUse, mount.path);
         return;
     }
+    Recover(store, mount, clock);
     const std::int64_t now_us = context_.monotonic_us();
-    if (!is_recovered_ && now_us >= after_recovery_.until_us) {
-        after_recovery_.Begin(now_us);
-        try {
-            recovery_failure_.clear();
-            is_recovered_ = maintenance::Recover(store, mount, context_.first_reserved_id().value_or(0), clock.now_s);
-        } catch (const std::system_error& error) {
-            recovery_failure_ = error.what();  // one folder that cannot be read must not stop retention
-        }
-        if (is_recovered_) {
-            after_recovery_ = {};
-        }
-    }
     maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.is_complete);
     const int space_requests = context_.space_requests;
-    if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
+    const bool is_kept_elsewhere = mount.IsShared() && !is_keeper_;
+    if (is_kept_elsewhere) {
+        disk_watch_ = maintenance::DiskWatch();
+        is_full_of_kept_ = false;
+    } else if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
         next_retention_us_ = now_us + kRetentionUs;
         EnforceRetention(store, mount, clock);
         is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
@@ -140,6 +148,57 @@ void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount&
         base::LogInfo("mount " + std::to_string(mount.id) + ": removed " + std::to_string(deleted.events) +
                       " old events");
     }
+}
+
+// A mount that is not shared is locked. Of a shared one whatever concerns this host's own recordings is done here, and
+// all else where its keeper is.
+bool MountMaintenance::MayMaintain(store::Store& store, const store::Mount& mount) {
+    if (!mount.IsShared()) {
+        return lock_.Hold(mount.path);
+    }
+    lock_.Release();
+    const bool was_keeper = std::exchange(is_keeper_, IsKeeper(store));
+    if (is_keeper_ && !was_keeper) {
+        must_recover_ = true;
+        base::LogInfo("maintains the shared mount " + std::to_string(mount.id));
+    }
+    return true;
+}
+
+bool MountMaintenance::IsKeeper(store::Store& store) {
+    const std::vector<store::Host> hosts = store::Hosts(store).All();
+    watch_.Observe(hosts, context_.monotonic_us());
+    std::set<int> ids;
+    std::ranges::transform(hosts, std::inserter(ids, ids.end()), &store::Host::id);
+    if (std::exchange(hosts_, ids) != ids) {
+        must_recover_ = true;  // what a host that was removed has left
+    }
+    store::SharedMounts shared(store);
+    const int keeper = shared.Keeper(mount_id_);
+    if (keeper == 0 || keeper == context_.host) {
+        return keeper != 0 || shared.Take(mount_id_, context_.host);
+    }
+    const auto host = std::ranges::find(hosts, keeper, &store::Host::id);
+    return host != hosts.end() && !watch_.IsOnline(keeper) && shared.Take(mount_id_, context_.host, *host);
+}
+
+void MountMaintenance::Recover(store::Store& store, const store::Mount& mount, const Clock& clock) {
+    const std::int64_t now_us = context_.monotonic_us();
+    if (!must_recover_ || now_us < after_recovery_.until_us) {
+        return;
+    }
+    after_recovery_.Begin(now_us);
+    try {
+        recovery_failure_.clear();
+        must_recover_ = !maintenance::Recover(store, mount, context_.first_reserved_id().value_or(0), clock.now_s,
+                                              {context_.host, is_keeper_});
+    } catch (const std::system_error& error) {
+        recovery_failure_ = error.what();  // one folder that cannot be read must not stop retention
+    }
+    if (!must_recover_) {
+        after_recovery_ = {};
+    }
+    is_recovered_ = !must_recover_;
 }
 
 void MountMaintenance::SetStatus(MountState state, const std::string& reason) {

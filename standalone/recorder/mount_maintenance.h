@@ -11,6 +11,7 @@
 #include <functional>
 #include <mutex>
 #include <optional>
+#include <set>
 #include <string>
 
 #include "standalone/base/clock.h"
@@ -20,6 +21,7 @@
 #include "standalone/maintenance/mount_lock.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/retention.h"
+#include "standalone/recorder/assignment.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/mounts.h"
 
@@ -33,6 +35,8 @@ struct MaintenanceContext {
     const std::atomic<int>& space_requests;  // grows when a disk is full
     std::function<std::int64_t()> monotonic_us = base::MonotonicMicros;
     std::function<std::int64_t()> wall_s = base::WallSeconds;
+    int host = 0;                          // as in RecorderLeaseKeeper
+    std::int64_t offline_us = 30'000'000;  // as in HostWatch
 };
 
 class MountMaintenance {
@@ -47,7 +51,7 @@ class MountMaintenance {
     maintenance::MountStatus Status() const;
     // Since this object was made.
     control::MountCounters Counters() const;
-    // What an earlier recorder left on the mount is finished.
+    // What an earlier recorder of this host left on the mount is finished; also while a shared mount is not here.
     bool IsRecovered() const { return is_recovered_; }
 
     // As in StoreThread.
@@ -72,6 +76,9 @@ class MountMaintenance {
     void Work(store::Store& store);
     void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
+    bool MayMaintain(store::Store& store, const store::Mount& mount);
+    bool IsKeeper(store::Store& store);
+    void Recover(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
     const int mount_id_;
@@ -80,7 +87,11 @@ class MountMaintenance {
     // Only the thread uses these.
     std::string recovery_failure_;  // of the last attempt
     maintenance::ClockWatch clock_watch_;
-    maintenance::MountLock lock_;
+    maintenance::MountLock lock_;  // of a mount that is not shared
+    HostWatch watch_;              // those that share the mount
+    std::set<int> hosts_;          // the same, as of the last recovery
+    bool is_keeper_ = false;       // of a shared mount
+    bool must_recover_ = true;
     maintenance::DiskWatch disk_watch_;
     Pause after_failure_;
     Pause after_recovery_;

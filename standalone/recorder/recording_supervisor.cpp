@@ -31,6 +31,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds host_offline_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
+      host_offline_limit_(host_offline_limit),
       flush_requests_(installation),
       camera_status_(installation),
       mount_counters_(installation),
@@ -115,9 +116,14 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         }
         entry->second.stream = {camera, plan.stream};
         RecordingRequest request{plan, marked.contains(camera) ? marked.at(camera) : 0};
-        if (const auto mount = mounts_.find(plan.mount_id);
-            mount != mounts_.end() && mount->second->Status().state == maintenance::MountState::kInUse) {
-            request.plan.mount_id = 0;
+        if (const auto mount = mounts_.find(plan.mount_id); mount != mounts_.end()) {
+            const maintenance::MountState state = mount->second->Status().state;
+            if (state == maintenance::MountState::kInUse) {
+                request.plan.mount_id = 0;
+            } else if (state == maintenance::MountState::kNotMounted && plan.own_mount_id != 0) {
+                request.plan.mount_id = plan.own_mount_id;
+                request.plan.mount = plan.own_mount;
+            }
         }
         entry->second.worker->SetRequest(request);
     }
@@ -257,7 +263,9 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
                             id,
                             MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstReservedId(); },
                                                [this](const store::Mark& mark) { return FootageHasEnded(mark); },
-                                               space_requests_},
+                                               space_requests_, base::MonotonicMicros, base::WallSeconds,
+                                               installation_.HostId(),
+                                               std::chrono::microseconds(host_offline_limit_).count()},
                             held_mounts_.contains(id)));
             });
         }

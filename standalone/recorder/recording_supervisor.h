@@ -66,6 +66,7 @@ class RecordingSupervisor {
 
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
+    const std::chrono::milliseconds host_offline_limit_;
     control::FlushRequests flush_requests_;
     CameraStatusTracker camera_status_;
     control::MountCountersWriter mount_counters_;

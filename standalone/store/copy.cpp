@@ -20,8 +20,9 @@ namespace lookhaven::store {
 namespace {
 
 // What belongs to the place and not to the records.
-constexpr std::array<std::string_view, 4> kNotCopied = {"schema_version", "recorder_lease", "camera_leases",
-                                                        "login_attempts"};
+constexpr std::array<std::string_view, 7> kNotCopied = {"schema_version", "recorder_lease",     "camera_leases",
+                                                        "login_attempts", "shared_mount_hosts", "mount_leases",
+                                                        "event_id_blocks"};
 
 constexpr std::string_view kPictures = "emap_pictures";
 

@@ -13,11 +13,11 @@ struct Mapping<Event> {
     static constexpr const char* kTable = "events";
     static constexpr const char* kColumns =
         "id, camera_id, mount_id, start_s, end_s, recording, reason, frame_count, size_bytes, video_type, audio_codec,"
-        " width, height, path, archived, demo, recording_order";
+        " width, height, path, archived, demo, recording_order, host_id";
     static auto Members(auto& event) {
         return std::tie(event.id, event.camera_id, event.mount_id, event.start_s, event.end_s, event.recording,
                         event.reason, event.frame_count, event.size_bytes, event.video_type, event.audio_codec,
-                        event.width, event.height, event.path, event.kept, event.demo, event.order);
+                        event.width, event.height, event.path, event.kept, event.demo, event.order, event.host_id);
     }
 };
 

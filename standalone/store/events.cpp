@@ -12,10 +12,16 @@
 
 namespace lookhaven::store {
 
+template <>
+struct Mapping<EventIdBlock> {
+    static auto Members(auto& block) { return std::tie(block.first_id, block.ids, block.host_id); }
+};
+
 namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::size_t kMaxCodecBytes = 32;
+constexpr std::int64_t kBlockDays = 3;  // longer than the two calendar days that recovery looks at
 constexpr int kRowsPerBatch = 10'000;
 constexpr int kMovedRowsPerBatch = 1'000;
 
@@ -74,6 +80,22 @@ int Events::NextId() {
 
 int Events::NextIds(int count) {
     return connection_.Write([&](soci::session& sql) { return store::NextIds(sql, "event", count); });
+}
+
+int Events::ReserveIds(int count, int host, std::int64_t now_s) {
+    return connection_.Write([&](soci::session& sql) {
+        const int first = store::NextIds(sql, "event", count);
+        Execute(sql, "delete from event_id_blocks where host_id = :host and reserved_s < :before", host,
+                now_s - kBlockDays * 86'400);
+        Execute(sql,
+                "insert into event_id_blocks (first_id, ids, host_id, reserved_s) values (:first, :ids, :host, :now)",
+                first, count, host, now_s);
+        return first;
+    });
+}
+
+std::vector<EventIdBlock> Events::ReservedBlocks() {
+    return connection_.FetchAll<EventIdBlock>("select first_id, ids, host_id from event_id_blocks");
 }
 
 void Events::Begin(const Event& event) {

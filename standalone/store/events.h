@@ -49,6 +49,7 @@ struct Event {
     // Lower is earlier, whatever the clock said. Its id, but for old recordings that got a new id; kOrderOfId until the
     // row is stored.
     std::int64_t order = kOrderOfId;
+    int host_id = 0;  // of store/hosts.h, which records or recorded it; 0: a single machine, or not known
 
     friend bool operator==(const Event&, const Event&) = default;
 };
@@ -86,6 +87,15 @@ struct Step {
 // Which reasons of recording a step stops at.
 enum class Reasons { kAny, kContinuous, kOthers };
 
+// Ids that a host has reserved for its events.
+struct EventIdBlock {
+    int first_id = 0;
+    int ids = 0;
+    int host_id = 0;
+
+    bool Has(int id) const { return id >= first_id && id - first_id < ids; }
+};
+
 // What a mount holds, without demo events.
 struct MountContent {
     std::int64_t events = 0;
@@ -119,6 +129,9 @@ class Events {
     // The first of that many consecutive ids; for the recorder, which must be able to begin events while the store is
     // away.
     int NextIds(int count);
+    // The same for events that the host records, which ReservedBlocks names for three days from then on.
+    int ReserveIds(int count, int host, std::int64_t now_s);
+    std::vector<EventIdBlock> ReservedBlocks();
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.
     void Begin(const Event& event);

@@ -5,6 +5,7 @@
 
 #include "standalone/base/host_name.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/mounts.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
@@ -90,12 +91,12 @@ void Hosts::Remove(int id) {
             ThrowNotFound("host", id);
         }
         if (!Exists(sql, "select id from hosts")) {
-            // One default alone.
+            // One default alone: its own, else that of the shared ones.
             Execute(sql,
-                    "update mounts set is_default = 0 where host_id = :id"
-                    " and exists (select 1 from mounts as shared where shared.host_id = 0)",
-                    id);
-            Execute(sql, "update mounts set host_id = 0 where host_id = :id", id);
+                    "update mounts set is_default = 0 where host_id = :all"
+                    " and exists (select 1 from mounts as own where own.host_id = :id)",
+                    kAllHosts, id);
+            Execute(sql, "update mounts set host_id = 0 where host_id in (:id, :all)", id, kAllHosts);
         }
     });
 }
@@ -114,10 +115,6 @@ std::vector<Host> Hosts::All() {
 
 int Hosts::HostOfCamera(int camera_id) {
     return connection_.FetchOne<int>("select host_id from camera_leases where camera_id = :id", camera_id).value_or(0);
-}
-
-int Hosts::HostOfMount(int mount_id) {
-    return connection_.FetchOne<int>("select host_id from mounts where id = :id", mount_id).value_or(0);
 }
 
 }  // namespace lookhaven::store

@@ -65,9 +65,6 @@ class Hosts {
 
     // The host that records the camera now, by its lease; 0 while none does. It may be offline, or removed.
     int HostOfCamera(int camera_id);
-    // The host that has the mount; 0 for one that all hosts share, for the only host's, and for an unknown one. It may
-    // be offline, or removed.
-    int HostOfMount(int mount_id);
 
   private:
     Connection& connection_;

@@ -43,7 +43,7 @@ bool IsInside(const std::string& inner, const std::string& outer) {
 
 // Whether one machine may have both.
 bool MayMeet(const Mount& one, const Mount& other) {
-    return one.host_id == other.host_id || one.host_id == 0 || other.host_id == 0;
+    return one.IsOf(other.host_id) || other.IsShared();
 }
 
 bool HasMounts(soci::session& sql, int host) {
@@ -175,7 +175,7 @@ std::optional<Mount> Mounts::FindForPlan(int id, int host) {
         }
     }
     return connection_.FetchOne<Mount>(
-        "where is_default = 1 and (host_id = :host or host_id = 0) order by host_id desc limit 1", host);
+        "where is_default = 1 and host_id in (:host, :all) order by host_id desc limit 1", host, kAllHosts);
 }
 
 std::vector<Mount> Mounts::List() {

@@ -12,6 +12,9 @@
 
 namespace lookhaven::store {
 
+// In place of a host's id: a folder that several hosts mount, at the same path each.
+constexpr int kAllHosts = -1;
+
 struct Mount {
     int id = 0;                  // from 1, never used twice, since events carry it
     std::string name;            // UTF-8, 1 to 64 bytes, no other mount's
@@ -20,10 +23,11 @@ struct Mount {
     std::int64_t max_age_s = 0;  // retention removes what is older; 0: no limit
     bool enabled = true;         // recordings are written to it; those on it can be played either way
     bool is_default = false;     // where cameras record that name no mount
-    int host_id = 0;             // the host that has it; 0: the only one, or every host of store/hosts.h shares it
+    int host_id = 0;             // of store/hosts.h, which has it; kAllHosts; 0: the only machine
 
+    bool IsShared() const { return host_id == kAllHosts; }
     // Whether that host may have it, or the only machine for 0.
-    bool IsOf(int host) const { return host_id == 0 || host_id == host; }
+    bool IsOf(int host) const { return IsShared() || host_id == host; }
 };
 
 // Invariants    (1) Every change raises Settings::Revision() in the same transaction.

@@ -261,6 +261,20 @@ constexpr const char* kLoads[] = {
     "alter table hosts add column processors integer not null default 0",
 };
 
+// A shared mount has no host's number but -1, which programs that do not know it take for that of another host.
+constexpr const char* kSharedMounts[] = {
+    // The host that records the event; 0 where programs do not say it.
+    "alter table events add column host_id integer not null default 0",
+    "alter table events_pending_deletion add column host_id integer not null default 0",
+    ("create table shared_mount_hosts (mount_id integer not null references mounts (id) on delete cascade,"
+     " host_id integer not null references hosts (id) on delete cascade, primary key (mount_id, host_id))"),
+    ("create table mount_leases (mount_id integer not null primary key references mounts (id) on delete cascade,"
+     " host_id integer not null references hosts (id) on delete cascade)"),
+    // No reference to hosts: what one that was removed has recorded is still to be recovered.
+    ("create table event_id_blocks (first_id integer not null primary key, ids integer not null,"
+     " host_id integer not null, reserved_s bigint not null)"),
+};
+
 constexpr Migration kMigrations[] = {
     {"accounts, sessions, cameras, settings", kAccountsAndCameras},
     {"recorded events, marks, mounts, recording plans, camera groups", kRecordings},
@@ -288,6 +302,7 @@ constexpr Migration kMigrations[] = {
     {.purpose = "access tokens", .statements = kAccessTokens, .is_addition = true},
     {.purpose = "the maximum age of a camera's recordings", .statements = kMaxAgesOfCameras, .is_addition = true},
     {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
+    {.purpose = "mounts that hosts share", .statements = kSharedMounts, .is_addition = true},
 };
 
 }  // namespace

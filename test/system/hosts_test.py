@@ -226,6 +226,26 @@ class HostsTest(unittest.TestCase):
                 self.assertEqual(server.request(snapshot, headers={"X-Lookhaven-Forwarded": token}).status,
                                  403 if status == 403 else 401, "it is no session")
 
+    def test_footage_on_a_shared_mount_is_read_where_it_is_asked_for(self):
+        def ask():
+            before = len(access_log.read_text())
+            answer = self.other.request(picture_at(self.event), "viewer")
+            return answer, "POST" in access_log.read_text()[before:]
+
+        access_log = self.owner.home / "log/access.log"
+        (path, mount), direct = self.sql("select path || '|' || id from mounts").split("|"), ask()
+        self.assertTrue(direct[1], "it is fetched while the mount is one host's")
+        self.addCleanup(self.sql, f"update mounts set host_id = 1, path = '{path}'")
+        self.sql("update mounts set host_id = -1")
+        answer, is_forwarded = ask()
+        self.assertEqual((answer.status, answer.body, is_forwarded), (200, direct[0].body, False))
+        self.sql("update mounts set path = '/nowhere'")
+        answer, is_forwarded = ask()
+        self.assertEqual((answer.status, is_forwarded), (503, False))
+        self.assertRegex(answer.json["error"]["message"], "shared mount .*, which no host has now")
+        self.sql(f"insert into shared_mount_hosts (mount_id, host_id) values ({mount}, 1)")
+        self.assertTrue(ask()[1], "a host says that it has it")
+
     def test_parts_of_several_hosts_make_no_export(self):
         self.sql("insert into mounts (id, name, path, max_bytes, max_age, enabled, is_default, host_id)"
                  " values (99, 'South', '/nowhere', 0, 0, 0, 0, 2)")

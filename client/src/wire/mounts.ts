@@ -20,6 +20,8 @@ export interface MountRecord extends Omit<MountSettings, "limitBytes" | "limitDa
   id: number;
   revision: number;
   path: string;
+  /** Several hosts have it. */
+  shared: boolean;
   state: string;
   /** What is wrong, as a sentence; may be empty. */
   message: string;

@@ -131,7 +131,8 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
 }
 
 void CliTest::UndoLastMigration() {
-    Sql({"alter table camera_leases drop column bytes_per_second", "alter table hosts drop column processors",
+    Sql({"drop table event_id_blocks", "drop table mount_leases", "drop table shared_mount_hosts",
+         "alter table events_pending_deletion drop column host_id", "alter table events drop column host_id",
          "update schema_version set version = version - 1"});
 }
 

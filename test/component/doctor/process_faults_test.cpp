@@ -157,6 +157,7 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
          [&] {
              add_host(1)();
              add_host(2)();
+             Sql("update mounts set host_id = 1")();
              Shell("echo 1 > " + host_file + " && chown --reference=" + home_.string() + " " + host_file)();
              report(maintenance::HostState::kOffline)();
          },

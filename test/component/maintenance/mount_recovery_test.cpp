@@ -11,6 +11,7 @@
 #include "standalone/base/installation.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/events.h"
+#include "standalone/store/hosts.h"
 #include "test/support/failing_status.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/footage/clips.h"
@@ -27,7 +28,7 @@ constexpr int kEvents = 3;
 
 class RecoveryTest : public testing::Test {
   protected:
-    // Recordings of one camera each, cut off before their end.
+    // Recordings of one camera each, by the host of the same number where a test has hosts, cut off before their end.
     RecoveryTest() {
         fs::permissions(folder_.Path(), fs::perms(0755));
         MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId()));
@@ -35,8 +36,8 @@ class RecoveryTest : public testing::Test {
         store::Events events(footage_.Records());
         for (int camera = 1; camera <= kEvents; ++camera) {
             store::Event row;
-            row.id = events.NextId();
-            row.camera_id = camera;
+            row.id = events.ReserveIds(1, camera, kStartS);
+            row.camera_id = row.host_id = camera;
             row.mount_id = footage_.MountId();
             row.start_s = row.end_s = kStartS;
             row.recording = true;
@@ -51,10 +52,10 @@ class RecoveryTest : public testing::Test {
         }
     }
 
-    bool Run() {
+    bool Run(const HostShare& share = {}) {
         const test::OrdinaryUser user;
         const store::Mount mount = store::Mounts(footage_.Records()).Find(footage_.MountId()).value();
-        return Recover(footage_.Records(), mount, 1000, kStartS + 3600);
+        return Recover(footage_.Records(), mount, 1000, kStartS + 3600, share);
     }
 
     fs::path FileOf(int event) { return footage_.FileOf(event); }
@@ -114,6 +115,35 @@ TEST_F(RecoveryTest, WhatIsWrongWithOneFileCostsThatFileAlone) {
     growing.reset();
     EXPECT_TRUE(Run());
     EXPECT_EQ(Rows(), "c-c");
+}
+
+TEST_F(RecoveryTest, OfASharedMountEachHostRecoversItsOwnAndTheKeeperWhatRemovedOnesHaveLeft) {
+    store::Hosts hosts(footage_.Records());
+    store::Mounts mounts(footage_.Records());
+    for (const char* name : {"nvr1", "nvr2", "nvr3"}) {
+        hosts.Add({.name = name,
+                   .address = "nvr.example",
+                   .port = 8443,
+                   .certificate = "-----BEGIN CERTIFICATE-----\nMII=\n-----END CERTIFICATE-----\n"});
+    }
+    store::Mount mount = mounts.Find(footage_.MountId()).value();
+    mount.host_id = store::kAllHosts;
+    mounts.Update(mount);
+    EXPECT_TRUE(Run({.host = 2}));
+    EXPECT_EQ(Rows(), "oco");
+    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_EQ(Rows(), "oco") << "they may be cut off from the store, and write on";
+    hosts.Remove(1);
+    EXPECT_TRUE(Run({.host = 2}));
+    EXPECT_EQ(Rows(), "oco");
+    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_EQ(Rows(), "cco");
+    store::Events(footage_.Records())
+        .Remove(std::array{1, 2, 3});  // files without rows: by the host that has reserved their ids
+    EXPECT_TRUE(Run({.host = 2}));
+    EXPECT_EQ(Rows(), "-c-");
+    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_EQ(Rows(), "cc-");
 }
 
 // Only the listing finds a recording that has no row: what it leaves out is never imported.

@@ -101,7 +101,7 @@ std::map<int, int> HostsTest::Holders() {
 std::map<int, std::multiset<int>> HostsTest::Recorded() {
     std::map<int, std::multiset<int>> recorded;
     for (const store::Event& event : store::Events(store_).Open()) {
-        recorded[store::Hosts(store_).HostOfMount(event.mount_id)].insert(event.camera_id);
+        recorded[event.host_id].insert(event.camera_id);
     }
     return recorded;
 }

@@ -59,7 +59,7 @@ class HostsTest : public testing::Test {
     int AddCamera(int fixed_host = 0);
 
     std::map<int, int> Holders();
-    // Cameras by the host to whose mount they are being recorded.
+    // Cameras by the host that records them.
     std::map<int, std::multiset<int>> Recorded();
     // The id of what is being recorded of the camera, or was when its recorder died; 0: nothing.
     int OpenEventOf(int camera);

@@ -4,9 +4,13 @@
 // or drained.
 #include <algorithm>
 
+#include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/camera_leases.h"
 #include "standalone/store/events.h"
 #include "standalone/store/hosts.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/recording_plans.h"
+#include "standalone/store/shared_mounts.h"
 #include "test/component/recorder/hosts_fixture.h"
 
 namespace lookhaven::test {
@@ -134,6 +138,49 @@ TEST_F(HostsTest, AStoreThatNobodyReachesMovesNothing) {
     }
     EXPECT_EQ(still, ids) << "in the same events";
     EXPECT_EQ(Recorded(), events);
+}
+
+TEST_F(HostsTest, OneHostMaintainsASharedMountAndEachRecoversWhatItHasRecorded) {
+    const TemporaryFolder folder;
+    store::Mounts mounts(store_);
+    const int mount = mounts.Add({.name = "shared", .path = fs::canonical(folder.Path()), .host_id = store::kAllHosts});
+    maintenance::MountFolder::WriteMarker(folder, maintenance::MarkerFor(store_, mount));
+    StartHosts(2);
+    const int cameras[] = {AddCamera(1), AddCamera(2)};
+    for (const int camera : cameras) {
+        store::RecordingPlans(store_).Set(camera, {.mode = store::RecordMode::kAlways, .mount_id = mount});
+    }
+    store::SharedMounts shared(store_);
+    ASSERT_TRUE(Eventually(kLimit, [&] {
+        const auto open = store::Events(store_).Open();
+        return shared.HostsWith(mount).size() == 2 && open.size() == 2 &&
+               std::ranges::all_of(open, [&](const store::Event& event) { return event.mount_id == mount; });
+    }));
+    const int keeper = shared.Keeper(mount);
+    ASSERT_TRUE(keeper == 1 || keeper == 2);
+    const int other = 3 - keeper;
+    const int left_open = OpenEventOf(cameras[keeper - 1]);
+    const int growing = OpenEventOf(cameras[other - 1]);
+    machines_[keeper - 1].Stop(SIGKILL);
+    ASSERT_TRUE(Eventually(
+        kLimit, [&] { return machines_[other - 1].Log().find("maintains the shared mount") != std::string::npos; }));
+    EXPECT_EQ(shared.Keeper(mount), other);
+    const auto find = [&](int event) { return *store::Events(store_).Find(event); };
+    const fs::path file = folder / find(left_open).path;
+    machines_[keeper - 1].Start();
+    ASSERT_TRUE(Eventually(kLimit, [&] { return !find(left_open).recording; }));
+    EXPECT_EQ(shared.Keeper(mount), other) << "it stays";
+    EXPECT_GT(find(left_open).frame_count, 0);
+    EXPECT_EQ(OpenEventOf(cameras[other - 1]), growing) << "what the other is writing is no lost recording";
+    store::Mount limited = *mounts.Find(mount);
+    limited.max_bytes = 1;
+    mounts.Update(limited);
+    EXPECT_TRUE(Eventually(kLimit, [&] { return !fs::exists(file); }));
+    for (Machine& machine : machines_) {
+        machine.Stop(SIGTERM);
+    }
+    ExpectNeverRecordedTwice();
+    ExpectSound();
 }
 
 TEST_F(HostsTest, AMachineThatIsNoHostOrASecondOneOfItRecordsNothing) {

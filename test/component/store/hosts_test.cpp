@@ -10,6 +10,7 @@
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
 #include "standalone/store/settings.h"
+#include "standalone/store/shared_mounts.h"
 #include "test/component/store/store_fixture.h"
 
 namespace lookhaven::store {
@@ -35,14 +36,14 @@ class HostTest : public StoreTest {
 
 TEST_P(HostTest, TheFirstOneGetsTheMountsThatThereAre) {
     const int old = mounts_.Add({.name = "old", .path = "/srv/a"});
-    EXPECT_EQ(hosts_.HostOfMount(old), 0);
+    EXPECT_EQ(mounts_.Find(old)->host_id, 0);
     const std::int64_t before = Settings(store_).Revision();
     const int first = hosts_.Add(Named("nvr1"));
     EXPECT_GT(Settings(store_).Revision(), before);
-    const int shared = AddMount("shared", "/srv/shared", 0);
+    const int shared = AddMount("shared", "/srv/shared", kAllHosts);
     const int second = hosts_.Add(Named("nvr2"));
-    EXPECT_EQ(hosts_.HostOfMount(old), first);
-    EXPECT_EQ(hosts_.HostOfMount(shared), 0) << "only the first host finds mounts of a single machine";
+    EXPECT_EQ(mounts_.Find(old)->host_id, first);
+    EXPECT_EQ(mounts_.Find(shared)->host_id, kAllHosts) << "only the first host finds mounts of a single machine";
     hosts_.Remove(second);
     EXPECT_EQ(hosts_.FindByName("nvr1"), hosts_.Find(first));
     EXPECT_FALSE(hosts_.Find(second));
@@ -111,8 +112,8 @@ TEST_P(HostTest, MountsOfTwoHostsMayHaveOnePathAndEachHasADefault) {
     const auto is_default = [this](int id) { return mounts_.Find(id)->is_default; };
     EXPECT_TRUE(is_default(one) && is_default(other));
     EXPECT_THROW(AddMount("inside", "/srv/a/b", second), AlreadyExists);
-    EXPECT_THROW(AddMount("shared", "/srv/a", 0), AlreadyExists) << "every host has it";
-    const int shared = AddMount("shared", "/srv/shared", 0);
+    EXPECT_THROW(AddMount("shared", "/srv/a", kAllHosts), AlreadyExists) << "every host has it";
+    const int shared = AddMount("shared", "/srv/shared", kAllHosts);
     EXPECT_THROW(AddMount("inside", "/srv/shared/b", first), AlreadyExists);
     const int next = AddMount("next", "/srv/b", second, true);
     EXPECT_TRUE(is_default(one) && !is_default(other) && is_default(next) && is_default(shared));
@@ -179,6 +180,31 @@ TEST_P(HostTest, OfManyOnOneCameraOneGetsTheLease) {
     EXPECT_EQ(taken, 1);
 }
 
+TEST_P(HostTest, OneOfTheHostsThatHaveASharedMountMaintainsItUntilItIsSilentOrWithoutIt) {
+    const int first = hosts_.Add(Named("nvr1"));
+    const int second = hosts_.Add(Named("nvr2"));
+    const int mount = AddMount("shared", "/srv/shared", kAllHosts);
+    SharedMounts shared(store_);
+    for (const int host : {first, second, second, 99}) {
+        shared.NotePresence(mount, host, true);
+    }
+    EXPECT_EQ(shared.HostsWith(mount), (std::vector<int>{first, second}));
+    EXPECT_FALSE(shared.Take(mount, 99)) << "there is no such host";
+    EXPECT_TRUE(shared.Take(mount, first));
+    EXPECT_FALSE(shared.Take(mount, second)) << "somebody has it";
+    const Host silent = *hosts_.Find(first);
+    RecorderLease(store_, first).Take(silent.heartbeat, "a", 1);
+    EXPECT_FALSE(shared.Take(mount, second, silent)) << "its heartbeat has changed";
+    EXPECT_TRUE(shared.Take(mount, second, *hosts_.Find(first)));
+    EXPECT_EQ(shared.Keeper(mount), second);
+    shared.NotePresence(mount, second, false);
+    EXPECT_EQ(shared.Keeper(mount), 0);
+    EXPECT_TRUE(shared.Take(mount, first));
+    hosts_.Remove(first);
+    EXPECT_EQ(shared.Keeper(mount), 0);
+    EXPECT_EQ(shared.HostsWith(mount), std::vector<int>());
+}
+
 TEST_P(HostTest, AfterTheLastHostItsMountsAreASingleMachinesAgain) {
     const int first = hosts_.Add(Named("nvr1"));
     const int second = hosts_.Add(Named("nvr2"));
@@ -186,10 +212,12 @@ TEST_P(HostTest, AfterTheLastHostItsMountsAreASingleMachinesAgain) {
     const int far = AddMount("far", "/srv/a", second);
     EXPECT_EQ(mounts_.FindForPlan(0, second)->id, far);
     EXPECT_EQ(mounts_.FindForPlan(own, second)->id, far) << "the other host's mount is not here";
+    const int shared = AddMount("shared", "/srv/shared", kAllHosts);
     hosts_.Remove(second);
     hosts_.Remove(first);
-    EXPECT_EQ(hosts_.HostOfMount(own), 0);
-    EXPECT_EQ(hosts_.HostOfMount(far), second);
+    EXPECT_EQ(mounts_.Find(shared)->host_id, 0);
+    EXPECT_EQ(mounts_.Find(own)->host_id, 0);
+    EXPECT_EQ(mounts_.Find(far)->host_id, second);
     EXPECT_EQ(mounts_.FindForPlan(0)->id, own);
 }
 

@@ -297,7 +297,7 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
   }, 20_000);
 
   test("limits that delete footage are saved when the user has seen how much", async () => {
-    const mount = { id: 1, revision: 1, name: "Disk", path: "/srv", enabled: true, default: true, state: "ready", message: "", total: 9e11, free: 5e11, used: 4e11 };
+    const mount = { id: 1, revision: 1, name: "Disk", path: "/srv", shared: false, enabled: true, default: true, state: "ready", message: "", total: 9e11, free: 5e11, used: 4e11 };
     setup.mount.splice(0, Infinity, { ...mount, oldest: null, limit: { bytes: null, days: null }, perDay: 1e10, lastsDays: null, history: [], camera: [{ id: 9, name: "", perDay: 1e10 }] });
     setup.loss = { events: 12, bytes: 3e9, until: 1_790_000_000 };
     const page = await open("storage");

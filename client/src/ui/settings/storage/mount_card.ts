@@ -17,7 +17,8 @@ import { forecastText, limitText, stateText } from "./storage_text";
 export function mountCard(mount: MountRecord): HTMLElement {
   const { id, name, path, enabled, state, message, total, free } = mount;
   const isWell = state === "ready";
-  const marks = [mount.default ? "default" : "", stateText(mount)].filter((text) => text).join(" · ");
+  const words = [mount.default ? "default" : "", mount.shared ? "shared by hosts" : "", stateText(mount)];
+  const marks = words.filter((text) => text).join(" · ");
   const head = element(
     "header",
     { class: "record-head" },
