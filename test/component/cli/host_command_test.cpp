@@ -85,6 +85,10 @@ TEST_F(CliHostsTest, TheFirstOneKeepsItsMountsAndOthersAddTheirOwn) {
           {add_mount, 0, "Added mount other"},
           {"mount set 1 --take-over", 65, "another host's"}});
     EXPECT_EQ(store::Mounts(store()).List().back().host_id, installation.HostId());
+    std::filesystem::create_directory(folder_ / "all");
+    Play({{"mount add " + (folder_ / "all").string() + " --shared", 0, "Added mount all"},
+          {"mount list", 0, "default shared"}});
+    EXPECT_EQ(store::Mounts(store()).List().back().host_id, store::kAllHosts);
 }
 
 TEST_F(CliHostsTest, CamerasAreFixedDrainedAndBalanced) {
