@@ -63,9 +63,9 @@ void Verify(const Console& console, const Request& request) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
         if (!mount.IsOf(host)) {
             left_alone[mount.id] = "";
-        } else if (const int keeper = store::SharedMounts(store).Keeper(mount.id);
-                   request.repair && mount.IsShared() && keeper != 0 && keeper != host) {
-            const auto name = store::Hosts(store).Find(keeper);
+        } else if (const int maintainer = store::SharedMounts(store).Maintainer(mount.id);
+                   request.repair && mount.IsShared() && maintainer != 0 && maintainer != host) {
+            const auto name = store::Hosts(store).Find(maintainer);
             left_alone[mount.id] = "it is repaired on the host that maintains it" + (name ? ", " + name->name : "");
         }
     }

@@ -66,7 +66,7 @@ class Responsibility {
   private:
     bool MayHave(int host, int event) const {
         return !is_shared_ || host == share_.host ? event < first_reserved_id_
-                                                  : share_.is_keeper && !hosts_.contains(host);
+                                                  : share_.maintains && !hosts_.contains(host);
     }
 
     const bool is_shared_;
@@ -99,7 +99,7 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_
     if (!folder) {
         return false;
     }
-    if (!mount.IsShared() || share.is_keeper) {
+    if (!mount.IsShared() || share.maintains) {
         Deletion(store, mount, *folder, now_s).Finish();
     }
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);

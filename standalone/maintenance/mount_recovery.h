@@ -13,7 +13,7 @@ namespace lookhaven::maintenance {
 // What a host has to do with a shared mount; of no account for any other.
 struct HostShare {
     int host = 0;
-    bool is_keeper = false;  // as in store/shared_mounts.h
+    bool maintains = false;  // as in store/shared_mounts.h
 };
 
 // Finishes deletions, closes the mount's open events after their last good frame, removes rows whose file is missing,
@@ -23,8 +23,8 @@ struct HostShare {
 // where the disk fails, which ends the pass: the files after it are as they were.
 //
 // Of a shared mount each host recovers what it has recorded itself: whether another one is still writing cannot be told
-// by what its files look like from here. The mount's keeper also recovers what hosts have recorded that were removed,
-// and finishes deletions.
+// from here by what its files look like. The host that maintains it also finishes deletions, and recovers what removed
+// hosts have recorded.
 bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s,
              const HostShare& share = {});
 

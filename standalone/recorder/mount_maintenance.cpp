@@ -2,7 +2,6 @@
 #include "standalone/recorder/mount_maintenance.h"
 
 #include <algorithm>
-#include <iterator>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -29,7 +28,7 @@ constexpr std::int64_t kMaxPauseUs = 600'000'000;
 MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, bool is_space_held)
     : mount_id_(mount_id),
       context_(std::move(context)),
-      watch_(context_.offline_us),
+      lease_(mount_id, context_.host, context_.offline_us),
       disk_watch_{maintenance::SpaceWatch(is_space_held), maintenance::SpaceWatch(is_space_held)},
       status_{mount_id, is_space_held ? MountState::kSpaceHeld : MountState::kReady, ""},
       counters_{.mount = mount_id},
@@ -76,9 +75,7 @@ void MountMaintenance::Work(store::Store& store) {
         after_failure_.Begin(now_us);
         SetStatus(MountState::kFailing, failure.what());
         // The folder may fail on this host alone.
-        if (std::exchange(is_keeper_, false)) {
-            store::SharedMounts(store).Release(mount_id_, context_.host);
-        }
+        lease_.GiveUp(store);
     }
 }
 
@@ -91,7 +88,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         SetStatus(MountState::kNotMounted, mount.path);
         must_recover_ = true;  // whatever is mounted later
         is_recovered_ = mount.IsShared();
-        is_keeper_ = false;
+        lease_.GiveUp(store);
         lock_.Release();
         return;
     }
@@ -103,7 +100,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const std::int64_t now_us = context_.monotonic_us();
     maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.is_complete);
     const int space_requests = context_.space_requests;
-    const bool is_kept_elsewhere = mount.IsShared() && !is_keeper_;
+    const bool is_kept_elsewhere = mount.IsShared() && !lease_.IsHeld();
     if (is_kept_elsewhere) {
         disk_watch_ = maintenance::DiskWatch();
         is_full_of_kept_ = false;
@@ -151,35 +148,15 @@ void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount&
 }
 
 // A mount that is not shared is locked. Of a shared one whatever concerns this host's own recordings is done here, and
-// all else where its keeper is.
+// all else by the host that maintains it.
 bool MountMaintenance::MayMaintain(store::Store& store, const store::Mount& mount) {
     if (!mount.IsShared()) {
         return lock_.Hold(mount.path);
     }
     lock_.Release();
-    const bool was_keeper = std::exchange(is_keeper_, IsKeeper(store));
-    if (is_keeper_ && !was_keeper) {
-        must_recover_ = true;
-        base::LogInfo("maintains the shared mount " + std::to_string(mount.id));
-    }
+    lease_.Renew(store, context_.monotonic_us());
+    must_recover_ |= lease_.HasChanged();
     return true;
-}
-
-bool MountMaintenance::IsKeeper(store::Store& store) {
-    const std::vector<store::Host> hosts = store::Hosts(store).All();
-    watch_.Observe(hosts, context_.monotonic_us());
-    std::set<int> ids;
-    std::ranges::transform(hosts, std::inserter(ids, ids.end()), &store::Host::id);
-    if (std::exchange(hosts_, ids) != ids) {
-        must_recover_ = true;  // what a host that was removed has left
-    }
-    store::SharedMounts shared(store);
-    const int keeper = shared.Keeper(mount_id_);
-    if (keeper == 0 || keeper == context_.host) {
-        return keeper != 0 || shared.Take(mount_id_, context_.host);
-    }
-    const auto host = std::ranges::find(hosts, keeper, &store::Host::id);
-    return host != hosts.end() && !watch_.IsOnline(keeper) && shared.Take(mount_id_, context_.host, *host);
 }
 
 void MountMaintenance::Recover(store::Store& store, const store::Mount& mount, const Clock& clock) {
@@ -191,7 +168,7 @@ void MountMaintenance::Recover(store::Store& store, const store::Mount& mount, c
     try {
         recovery_failure_.clear();
         must_recover_ = !maintenance::Recover(store, mount, context_.first_reserved_id().value_or(0), clock.now_s,
-                                              {context_.host, is_keeper_});
+                                              {context_.host, lease_.IsHeld()});
     } catch (const std::system_error& error) {
         recovery_failure_ = error.what();  // one folder that cannot be read must not stop retention
     }

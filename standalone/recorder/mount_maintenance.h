@@ -11,7 +11,6 @@
 #include <functional>
 #include <mutex>
 #include <optional>
-#include <set>
 #include <string>
 
 #include "standalone/base/clock.h"
@@ -21,7 +20,7 @@
 #include "standalone/maintenance/mount_lock.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/retention.h"
-#include "standalone/recorder/assignment.h"
+#include "standalone/recorder/mount_lease_keeper.h"
 #include "standalone/recorder/store_thread.h"
 #include "standalone/store/mounts.h"
 
@@ -77,7 +76,6 @@ class MountMaintenance {
     void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
     bool MayMaintain(store::Store& store, const store::Mount& mount);
-    bool IsKeeper(store::Store& store);
     void Recover(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
@@ -88,9 +86,7 @@ class MountMaintenance {
     std::string recovery_failure_;  // of the last attempt
     maintenance::ClockWatch clock_watch_;
     maintenance::MountLock lock_;  // of a mount that is not shared
-    HostWatch watch_;              // those that share the mount
-    std::set<int> hosts_;          // the same, as of the last recovery
-    bool is_keeper_ = false;       // of a shared mount
+    MountLeaseKeeper lease_;       // of one that is
     bool must_recover_ = true;
     maintenance::DiskWatch disk_watch_;
     Pause after_failure_;

@@ -258,15 +258,15 @@ void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
     for (const auto& [id, is_enabled] : catalog.mounts) {
         if (!mounts_.contains(id)) {
             Start("maintenance of mount " + std::to_string(id), [&, id = id] {
-                mounts_.emplace(
-                    id, std::make_unique<MountMaintenance>(
-                            id,
-                            MaintenanceContext{installation_.StoreUrl(), [this] { return rows_.FirstReservedId(); },
-                                               [this](const store::Mark& mark) { return FootageHasEnded(mark); },
-                                               space_requests_, base::MonotonicMicros, base::WallSeconds,
-                                               installation_.HostId(),
-                                               std::chrono::microseconds(host_offline_limit_).count()},
-                            held_mounts_.contains(id)));
+                MaintenanceContext context{
+                    .store_url = installation_.StoreUrl(),
+                    .first_reserved_id = [this] { return rows_.FirstReservedId(); },
+                    .is_complete = [this](const store::Mark& mark) { return FootageHasEnded(mark); },
+                    .space_requests = space_requests_,
+                    .host = installation_.HostId(),
+                    .offline_us = std::chrono::microseconds(host_offline_limit_).count()};
+                mounts_.emplace(id,
+                                std::make_unique<MountMaintenance>(id, std::move(context), held_mounts_.contains(id)));
             });
         }
         const auto mount = mounts_.find(id);

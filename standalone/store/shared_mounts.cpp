@@ -23,7 +23,7 @@ std::vector<int> SharedMounts::HostsWith(int mount_id) {
                                      mount_id);
 }
 
-int SharedMounts::Keeper(int mount_id) {
+int SharedMounts::Maintainer(int mount_id) {
     return connection_.FetchOne<int>("select host_id from mount_leases where mount_id = :mount", mount_id).value_or(0);
 }
 

@@ -25,9 +25,9 @@ class SharedMounts {
     std::vector<int> HostsWith(int mount_id);
 
     // The host that maintains the mount; 0 while none does. It may be offline.
-    int Keeper(int mount_id);
+    int Maintainer(int mount_id);
     // Takes the lease that nobody has, or the host of that record as long as its heartbeat is still that one. False
-    // when somebody else was faster. A heartbeat that comes meanwhile is not waited for: until the former keeper has
+    // when somebody else was faster. A heartbeat that comes meanwhile is not waited for: until the former one has
     // asked again, both may maintain the mount, which deletes nothing that one of them alone would not delete.
     bool Take(int mount_id, int host, const Host& silent = {});
     // Gives the lease up if it is the host's.

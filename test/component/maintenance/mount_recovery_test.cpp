@@ -117,7 +117,7 @@ TEST_F(RecoveryTest, WhatIsWrongWithOneFileCostsThatFileAlone) {
     EXPECT_EQ(Rows(), "c-c");
 }
 
-TEST_F(RecoveryTest, OfASharedMountEachHostRecoversItsOwnAndTheKeeperWhatRemovedOnesHaveLeft) {
+TEST_F(RecoveryTest, OfASharedMountEachHostRecoversItsOwnAndTheMaintainerWhatRemovedOnesHaveLeft) {
     store::Hosts hosts(footage_.Records());
     store::Mounts mounts(footage_.Records());
     for (const char* name : {"nvr1", "nvr2", "nvr3"}) {
@@ -131,18 +131,18 @@ TEST_F(RecoveryTest, OfASharedMountEachHostRecoversItsOwnAndTheKeeperWhatRemoved
     mounts.Update(mount);
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "oco");
-    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
     EXPECT_EQ(Rows(), "oco") << "they may be cut off from the store, and write on";
     hosts.Remove(1);
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "oco");
-    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
     EXPECT_EQ(Rows(), "cco");
     store::Events(footage_.Records())
         .Remove(std::array{1, 2, 3});  // files without rows: by the host that has reserved their ids
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "-c-");
-    EXPECT_TRUE(Run({.host = 2, .is_keeper = true}));
+    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
     EXPECT_EQ(Rows(), "cc-");
 }
 

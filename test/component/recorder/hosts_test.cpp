@@ -156,20 +156,20 @@ TEST_F(HostsTest, OneHostMaintainsASharedMountAndEachRecoversWhatItHasRecorded) 
         return shared.HostsWith(mount).size() == 2 && open.size() == 2 &&
                std::ranges::all_of(open, [&](const store::Event& event) { return event.mount_id == mount; });
     }));
-    const int keeper = shared.Keeper(mount);
-    ASSERT_TRUE(keeper == 1 || keeper == 2);
-    const int other = 3 - keeper;
-    const int left_open = OpenEventOf(cameras[keeper - 1]);
+    const int maintainer = shared.Maintainer(mount);
+    ASSERT_TRUE(maintainer == 1 || maintainer == 2);
+    const int other = 3 - maintainer;
+    const int left_open = OpenEventOf(cameras[maintainer - 1]);
     const int growing = OpenEventOf(cameras[other - 1]);
-    machines_[keeper - 1].Stop(SIGKILL);
+    machines_[maintainer - 1].Stop(SIGKILL);
     ASSERT_TRUE(Eventually(
         kLimit, [&] { return machines_[other - 1].Log().find("maintains the shared mount") != std::string::npos; }));
-    EXPECT_EQ(shared.Keeper(mount), other);
+    EXPECT_EQ(shared.Maintainer(mount), other);
     const auto find = [&](int event) { return *store::Events(store_).Find(event); };
     const fs::path file = folder / find(left_open).path;
-    machines_[keeper - 1].Start();
+    machines_[maintainer - 1].Start();
     ASSERT_TRUE(Eventually(kLimit, [&] { return !find(left_open).recording; }));
-    EXPECT_EQ(shared.Keeper(mount), other) << "it stays";
+    EXPECT_EQ(shared.Maintainer(mount), other) << "it stays";
     EXPECT_GT(find(left_open).frame_count, 0);
     EXPECT_EQ(OpenEventOf(cameras[other - 1]), growing) << "what the other is writing is no lost recording";
     store::Mount limited = *mounts.Find(mount);

@@ -196,12 +196,12 @@ TEST_P(HostTest, OneOfTheHostsThatHaveASharedMountMaintainsItUntilItIsSilentOrWi
     RecorderLease(store_, first).Take(silent.heartbeat, "a", 1);
     EXPECT_FALSE(shared.Take(mount, second, silent)) << "its heartbeat has changed";
     EXPECT_TRUE(shared.Take(mount, second, *hosts_.Find(first)));
-    EXPECT_EQ(shared.Keeper(mount), second);
+    EXPECT_EQ(shared.Maintainer(mount), second);
     shared.NotePresence(mount, second, false);
-    EXPECT_EQ(shared.Keeper(mount), 0);
+    EXPECT_EQ(shared.Maintainer(mount), 0);
     EXPECT_TRUE(shared.Take(mount, first));
     hosts_.Remove(first);
-    EXPECT_EQ(shared.Keeper(mount), 0);
+    EXPECT_EQ(shared.Maintainer(mount), 0);
     EXPECT_EQ(shared.HostsWith(mount), std::vector<int>());
 }
 
