@@ -25,7 +25,7 @@ HOSTS = (1, 2, 4)
 CAMERAS, CAMERAS_A_HOST = 1000, 250
 EVENT_S, MARK_S = 300, 600
 SETTLE_S, SECONDS = 10.0, 30.0
-ROUNDS, RESUME_S = 5, 3.0
+ROUNDS, RESUME_S = 5, 10.0  # whoever stood still has stored what it missed before the questions
 DATABASE = "hosts"
 
 

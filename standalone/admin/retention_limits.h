@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Limits of what is kept: in records, and the question before a lower one has recordings deleted, which the recorder
+// Retention limits: in records, and the question before a lower one has recordings deleted, which the recorder
 // does within seconds.
 #pragma once
 

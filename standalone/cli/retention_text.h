@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Limits of what is kept: how they are shown, and the question before a lower one deletes recordings.
+// Retention limits: how they are shown, and the question before a lower one deletes recordings.
 #pragma once
 
 #include <string>

@@ -170,7 +170,7 @@ void Pictures::Share() {
 }
 
 // Without it each view would fetch megabytes from the store.
-void Pictures::Keep(const std::string& name, std::string_view bytes) noexcept try {
+void Pictures::SaveFile(const std::string& name, std::string_view bytes) noexcept try {
     const std::set<std::string> used = Used();
     SweepFiles(used);
     fs::create_directories(folder_);
@@ -192,7 +192,7 @@ std::string Pictures::Read(const std::string& name) {
         if (!shared || shared->size() > kMaxPictureBytes || PictureType(*shared) != name.substr(name.find('.') + 1)) {
             throw;
         }
-        Keep(name, *shared);
+        SaveFile(name, *shared);
         return *std::move(shared);
     }
 }

@@ -57,7 +57,7 @@ class Pictures {
 
   private:
     std::string ReadFile(const std::string& name) const;
-    void Keep(const std::string& name, std::string_view bytes) noexcept;
+    void SaveFile(const std::string& name, std::string_view bytes) noexcept;
     void SweepFiles(const std::set<std::string>& used);
     std::set<std::string> Used();
 

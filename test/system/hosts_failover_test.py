@@ -49,6 +49,9 @@ class HostsFailoverTest(unittest.TestCase):
         cls.servers = [primary, standby]
         url = (f"postgresql://postgres@127.0.0.1:{primary.port},127.0.0.1:{standby.port}/hosts"
                "?target_session_attrs=read-write")
+        cls.shared = pathlib.Path(cls.enterClassContext(tempfile.TemporaryDirectory())) / "recordings"
+        cls.shared.mkdir()
+        cls.shared.parent.chmod(0o755)
         build = hasty_build(pathlib.Path(cls.enterClassContext(tempfile.TemporaryDirectory())))
         cls.hosts = [Installation(LOOKHAVEN_BUILD_FOLDER=build, LOOKHAVEN_DEMO="no") for _ in NAMES]
         for number, (name, host) in enumerate(zip(NAMES, cls.hosts)):
@@ -66,6 +69,8 @@ class HostsFailoverTest(unittest.TestCase):
                 shutil.chown(folder, host.home.stat().st_uid, host.home.stat().st_gid)
                 host.cli("mount", "add", str(folder), "--name", f"{name}-disk")
             host.start()
+        shutil.chown(cls.shared, host.home.stat().st_uid, host.home.stat().st_gid)
+        host.cli("mount", "add", str(cls.shared), "--name", "shared", "--shared")
         cls.fill(cls.hosts[0])
         cls.wait_until_recorded("they share the cameras out")
 
@@ -114,8 +119,8 @@ class HostsFailoverTest(unittest.TestCase):
         wait_until(have_come, 20 + 2 * SEGMENT_S * count, f"{count} more recordings of each camera")
 
     def files(self):
-        return {path for host in self.hosts for folder in (host.home, host.home.parent)
-                for path in folder.glob("recordings/*/*/*.mkv")}
+        homes = [folder for host in self.hosts for folder in (host.home, host.home.parent)]
+        return {path for folder in (*homes, self.shared.parent) for path in folder.glob("recordings/*/*/*.mkv")}
 
     def check_footage(self, since, may_lack=()):
         """Every file has its row, and every row its file; of each camera one event follows the other without a second
@@ -137,6 +142,7 @@ class HostsFailoverTest(unittest.TestCase):
                         self.assertLessEqual(start, end + 1, "seconds are lost")
 
     def finished_event(self, camera, host=None):
+        """Of any mount, or of that host's; -1 for the shared one."""
         mount = "" if host is None else f" and mounts.host_id = {host}"
         query = ("select events.id, start_s from events join mounts on mounts.id = mount_id where recording = 0"
                  f" and camera_id = {camera}{mount} order by start_s limit 1")
@@ -186,7 +192,10 @@ class HostsFailoverTest(unittest.TestCase):
         lost, witness = self.hosts[2], self.hosts[0]
         before = self.cameras_by_host()
         floating = sorted(before[2] - {CAMERAS})
+        mount = self.sql("select id from mounts where host_id = -1")[0][0]
+        witness.cli("camera", "set", str(floating[0]), "--mount", mount)
         since, event = int(time.time()), self.finished_event(CAMERAS, host=3)
+        shared_event = self.finished_event(floating[0], host=-1)
         with witness.live(floating[0]) as parts:
             parts.next()
             began = time.monotonic()
@@ -201,6 +210,9 @@ class HostsFailoverTest(unittest.TestCase):
         self.assertIn({CAMERAS}, self.cameras_by_host(), "the fixed one waits")
         answer = witness.request(call("VEXO.Event", "Download", event=event["id"]), "admin")
         self.assertEqual(answer.status, 503)
+        for host in self.hosts[:2]:
+            answer_of_shared = host.request(call("VEXO.Event", "Download", event=shared_event["id"]), "admin")
+            self.assertEqual(answer_of_shared.status, 200, "what it has recorded to a shared mount")
         self.assertIn(f"camera {CAMERAS} is on host nvr3, which is offline", answer.json["error"]["message"])
         self.assertIn(event["id"], [each["id"] for each in recorded_events(witness, CAMERAS)], "it is still listed")
         lost.start()

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Saves limits of what is kept. Nothing is deleted before the user has seen how much that is.
+// Saves retention limits. Nothing is deleted before the user has seen how much that is.
 
 import type { Unconfirmed } from "../../wire/footage_loss";
 import { bytesText, counted } from "../widgets/amounts";
