@@ -122,6 +122,8 @@ Problems FindProblems(const base::Installation& installation, store::Store* reco
         problems.push_back({"recorder", 0, state == control::RecorderState::kHangs ? "it hangs" : "it does not run"});
     } else if (streams = control::ReadStreamCounters(installation); streams) {
         CheckStreams(*streams, problems);
+    } else {
+        problems.push_back({"recorder", 0, "its cameras cannot be checked, because its counts cannot be read"});
     }
     if (records == nullptr) {
         problems.push_back({"store", 0, "the record store cannot be opened"});

@@ -13,11 +13,15 @@
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <exception>
 #include <filesystem>
 #include <optional>
+#include <string>
+#include <system_error>
 #include <utility>
 #include <vector>
 
+#include "standalone/base/log.h"
 #include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
@@ -26,11 +30,8 @@ namespace lookhaven::control {
 template <class Row, std::size_t kMaxRows, std::uint64_t kVersion>
 class CounterTable {
   public:
-    // Puts an empty table in place of an earlier process's. Throws std::system_error.
-    template <class Table>
-    static MappedTable<Table> Replace(const std::filesystem::path& path) {
-        return MappedTable<Table>::Replace(path, [](Table& table) { table.version_ = kVersion; });
-    }
+    // Nothing has been written yet.
+    void Begin() { version_ = kVersion; }
 
     // Replaces what was written before; what does not fit is left out.
     template <class Counters>
@@ -61,6 +62,42 @@ class CounterTable {
     std::atomic<std::uint64_t> version_;
     std::atomic<std::uint64_t> used_;
     std::array<Row, kMaxRows> rows_;
+};
+
+// The counting process's side of a Table, which is a CounterTable. A process whose table cannot be made says so once
+// and works without it, and each Write tries again.
+template <class Table>
+class CounterTableWriter {
+  public:
+    // Puts an empty table in place of an earlier process's.
+    explicit CounterTableWriter(std::filesystem::path path) : path_(std::move(path)) { Replace(); }
+
+    template <class Counters>
+    void Write(const std::vector<Counters>& all) {
+        if (!table_) {
+            Replace();
+        }
+        if (table_) {
+            (*table_)->Write(all);
+        }
+    }
+
+  private:
+    void Replace() {
+        try {
+            table_.emplace(MappedTable<Table>::Replace(path_, [](Table& table) { table.Begin(); }));
+        } catch (const std::exception& failure) {
+            std::error_code ignored;
+            std::filesystem::remove(path_, ignored);  // an earlier process's numbers are not this one's
+            if (!std::exchange(has_failed_, true)) {
+                base::LogError(std::string("monitoring is without some numbers until this works: ") + failure.what());
+            }
+        }
+    }
+
+    const std::filesystem::path path_;
+    std::optional<MappedTable<Table>> table_;
+    bool has_failed_ = false;
 };
 
 }  // namespace lookhaven::control

@@ -4,8 +4,6 @@
 #include <atomic>
 #include <filesystem>
 
-#include "standalone/control/counter_table.h"
-
 namespace lookhaven::control {
 
 namespace {
@@ -39,11 +37,10 @@ struct Row {
 
 struct MountCountersWriter::Table : CounterTable<Row, kMaxMounts, kVersion> {};
 
-MountCountersWriter::MountCountersWriter(const base::Installation& installation)
-    : table_(Table::Replace<Table>(PathOf(installation))) {}
+MountCountersWriter::MountCountersWriter(const base::Installation& installation) : table_(PathOf(installation)) {}
 
 void MountCountersWriter::Write(const std::vector<MountCounters>& mounts) {
-    table_->Write(mounts);
+    table_.Write(mounts);
 }
 
 std::vector<MountCounters> ReadMountCounters(const base::Installation& installation) {

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "standalone/base/installation.h"
-#include "standalone/control/mapped_table.h"
+#include "standalone/control/counter_table.h"
 
 namespace lookhaven::control {
 
@@ -23,7 +23,7 @@ struct MountCounters {
 // The recorder's side.
 class MountCountersWriter {
   public:
-    // Puts an empty table in place of an earlier recorder's. Throws std::system_error.
+    // Puts an empty table in place of an earlier recorder's. One that cannot be made costs nothing but the counts.
     explicit MountCountersWriter(const base::Installation& installation);
 
     // Replaces what was written before; mounts beyond the 256th are left out.
@@ -33,7 +33,7 @@ class MountCountersWriter {
     struct Table;
     friend std::vector<MountCounters> ReadMountCounters(const base::Installation& installation);
 
-    MappedTable<Table> table_;
+    CounterTableWriter<Table> table_;
 };
 
 // What the recorder wrote last; empty when none has run, or one of another version. Check FindRecorder too.

@@ -4,8 +4,6 @@
 #include <atomic>
 #include <filesystem>
 
-#include "standalone/control/counter_table.h"
-
 namespace lookhaven::control {
 
 namespace {
@@ -70,11 +68,10 @@ struct Row {
 
 struct StreamCountersWriter::Table : CounterTable<Row, kMaxStreams, kVersion> {};
 
-StreamCountersWriter::StreamCountersWriter(const base::Installation& installation)
-    : table_(Table::Replace<Table>(PathOf(installation))) {}
+StreamCountersWriter::StreamCountersWriter(const base::Installation& installation) : table_(PathOf(installation)) {}
 
 void StreamCountersWriter::Write(const std::vector<StreamCounters>& streams) {
-    table_->Write(streams);
+    table_.Write(streams);
 }
 
 std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation) {

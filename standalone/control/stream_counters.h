@@ -9,8 +9,8 @@
 #include <vector>
 
 #include "standalone/base/installation.h"
+#include "standalone/control/counter_table.h"
 #include "standalone/control/demand.h"
-#include "standalone/control/mapped_table.h"
 
 namespace lookhaven::control {
 
@@ -38,7 +38,7 @@ struct StreamCounters {
 // The recorder's side.
 class StreamCountersWriter {
   public:
-    // Puts an empty table in place of an earlier recorder's. Throws std::system_error.
+    // Puts an empty table in place of an earlier recorder's. One that cannot be made costs nothing but the counts.
     explicit StreamCountersWriter(const base::Installation& installation);
 
     // Replaces what was written before; streams beyond the 1024th are left out.
@@ -48,7 +48,7 @@ class StreamCountersWriter {
     struct Table;
     friend std::optional<std::vector<StreamCounters>> ReadStreamCounters(const base::Installation& installation);
 
-    MappedTable<Table> table_;
+    CounterTableWriter<Table> table_;
 };
 
 // What the recorder wrote last; nothing when none has run, or one of another version. A recorder that has ended leaves

@@ -17,6 +17,8 @@ from installation import ROOT, Installation, call, wait_until
 
 SAMPLE = re.compile(r'([a-z_]+)(?:\{((?:[a-z]+="(?:[^"\\\n]|\\.)*",?)*)\})? ([-+.e0-9]+|\+Inf)')
 
+UNCHECKED = "its cameras cannot be checked, because its counts cannot be read"
+
 
 def own_address():
     """An address of this machine that is not of the loopback; none without a network."""
@@ -62,7 +64,13 @@ class MonitoringTest(unittest.TestCase):
         recorder = self.server.part("recorder")
         os.kill(recorder, signal.SIGSTOP)
         wait_until(lambda: ("recorder", "it hangs") in self.problems(), 10, "a recorder that hangs is told")
-        os.kill(recorder, signal.SIGCONT)
+        in_the_way = self.server.home / "run/stream-counters.new/x"
+        in_the_way.mkdir(parents=True)
+        (self.server.home / "run/recordings").unlink()
+        os.kill(recorder, signal.SIGKILL)
+        wait_until(lambda: ("recorder", UNCHECKED) in self.problems(), 10, "a recorder that cannot count is told")
+        wait_until(lambda: self.server.recording_cameras(), 20, "it records without")
+        shutil.rmtree(in_the_way.parent)
         mount = pathlib.Path(json.loads(self.server.cli("mount", "list", "--json"))[0]["path"])
         away = mount.with_name("away")
         mount.rename(away)
