@@ -135,6 +135,15 @@ os.execv("{program}", ["{program}", *words])
                 self.assertGreaterEqual(len(said[account]), 12)
                 server.login(account, said[account])
 
+    def test_a_journal_gets_no_password(self):
+        server = Installation()
+        output = server.home.with_name("output")
+        output.touch()
+        server.environment["JOURNAL_STREAM"] = f"{output.stat().st_dev}:{output.stat().st_ino}"
+        with server:
+            self.assertIn("set at the first start", server.said())
+            self.assertNotIn("correct horse", server.said())
+
     def test_parts_run_without_privilege_and_in_private_folders(self):
         with Installation() as server:
             for part in ("recorder", "webapi", "nginx"):
