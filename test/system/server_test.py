@@ -117,7 +117,7 @@ os.execv("{program}", ["{program}", *words])
             self.assertNotIn("viewer", first.said())
             self.assertEqual(json.loads(first.cli("camera", "list", "--json")), [])
 
-    def test_whatever_ends_the_script_leaves_nothing_running_and_the_next_start_works(self):
+    def test_whatever_ends_the_script_leaves_nothing_running_and_the_next_start_works_elsewhere_too(self):
         with Installation() as server:
             password_line = server.said()
             for how in (signal.SIGTERM, signal.SIGINT, signal.SIGHUP, signal.SIGKILL):
@@ -127,6 +127,11 @@ os.execv("{program}", ["{program}", *words])
                     self.assertIn("set at the first start", server.said())
                     server.login("admin")
             self.assertIn("correct horse", password_line)
+            server.stop()
+            server.home = server.home.rename(server.home.with_name("moved"))
+            server.environment["LOOKHAVEN_HOME"] = str(server.home)
+            server.start()
+            self.assertEqual(json.loads(server.cli("mount", "list", "--json"))[0]["path"], str(server.home / "recordings"))
 
     def test_passwords_are_generated_when_none_is_given(self):
         with Installation(LOOKHAVEN_ADMIN_PASSWORD="", LOOKHAVEN_VIEWER_PASSWORD="") as server:
