@@ -10,6 +10,7 @@
 
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/settings.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::admin {
 
@@ -42,6 +43,16 @@ void RequireFreeFolder(store::Store& store, const std::string& path, int mount_i
         "the folder " + path + " belongs to " +
             (is_ours ? "mount " + std::to_string(found->mount_id) : "another installation of Lookhaven") +
             ": with --take-over this mount gets it, and nothing else may record to it then");
+}
+
+void RequireSharedFolder(store::Store& store, const store::Mount& mount, int own_host) {
+    const std::vector<int> hosts = store::SharedMounts(store).HostsWith(mount.id);
+    const bool is_elsewhere = std::ranges::any_of(hosts, [own_host](int host) { return host != own_host; });
+    if (mount.IsShared() && is_elsewhere && !maintenance::OpenMount(store, mount)) {
+        throw UnusableFolder(UnusableFolder::Reason::kAbsent, "the folder " + mount.path +
+                                                                  " is not marked as the shared mount \"" + mount.name +
+                                                                  "\", which other hosts have: mount it there first");
+    }
 }
 
 void MarkFolder(store::Store& store, const store::Mount& mount) {

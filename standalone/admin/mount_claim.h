@@ -29,6 +29,10 @@ std::string RequireFolder(const std::string& path);
 // its footage; not with take_over. mount_id: 0 for a new mount.
 void RequireFreeFolder(store::Store& store, const std::string& path, int mount_id, bool take_over);
 
+// Throws UnusableFolder for a folder that is not marked as the shared mount that other hosts have: its disk may not be
+// mounted there.
+void RequireSharedFolder(store::Store& store, const store::Mount& mount, int own_host);
+
 // Marks the folder as that of the mount. Throws std::system_error.
 void MarkFolder(store::Store& store, const store::Mount& mount);
 

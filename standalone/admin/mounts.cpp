@@ -49,7 +49,8 @@ Json::Value MountRecord(const store::Mount& mount) {
 store::Mount AddMount(store::Store& store, const Actor& actor, const MountChange& change) {
     store::Mount mount;
     if (change.is_shared && change.own_host == 0) {
-        throw store::InvalidRecord("only hosts that have one store in PostgreSQL share mounts: see lookhaven host add");
+        throw store::InvalidRecord(
+            "a shared mount needs hosts that share a store in PostgreSQL: see lookhaven host add");
     }
     mount.host_id = change.is_shared ? store::kAllHosts : change.own_host;
     change.ApplyTo(mount);
@@ -77,6 +78,7 @@ store::Mount SetMount(store::Store& store, const Actor& actor, int id, std::opti
     }
     if (is_marked) {
         RequireFreeFolder(store, RequireFolder(mount.path), id, change.take_over);
+        RequireSharedFolder(store, mount, change.own_host);
     }
     RequireCurrent(MountRecord(known), seen);
     if (!change.confirmed && (IsLower(mount.max_bytes, known.max_bytes) || IsLower(mount.max_age_s, known.max_age_s))) {

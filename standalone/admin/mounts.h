@@ -28,7 +28,7 @@ struct MountChange {
     std::optional<bool> enabled = {};
     bool is_default = false;  // can be set, not cleared
     int own_host = 0;         // the machine's own: OwnHost of hosts.h
-    bool is_shared = false;   // by all hosts; of a new mount
+    bool is_shared = false;   // by the hosts; only when adding
     bool take_over = false;   // also a folder that is another mount's
     bool confirmed = false;   // also where a lower limit deletes recordings
 

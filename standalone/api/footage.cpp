@@ -14,8 +14,15 @@ namespace lookhaven::api {
 namespace {
 
 Footage Of(const store::Event& event) {
-    return {event.id,    std::nullopt,    event.camera_id, event.mount_id, event.start_s,
-            event.end_s, event.recording, event.path,      event.host_id};
+    return {.id = event.id,
+            .kind = std::nullopt,
+            .camera_id = event.camera_id,
+            .mount_id = event.mount_id,
+            .start_s = event.start_s,
+            .end_s = event.end_s,
+            .grows = event.recording,
+            .path = event.path,
+            .host_id = event.host_id};
 }
 
 Footage Require(const Call& call, std::optional<Footage> footage, store::CameraAccess access) {

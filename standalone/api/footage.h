@@ -25,7 +25,7 @@ struct Footage {
     std::int64_t end_s = 0;
     bool grows = false;          // more of a recorded event may come
     std::filesystem::path path;  // relative to the mount; once it was required, absolute
-    int recorder = 0;            // the host that records or recorded an event, where hosts share the store
+    int host_id = 0;             // as in store::Event
 };
 
 // The call's parameter "kind". Throws Failure 400 for what is neither "alert" nor "pos"; nothing when it is missing.

@@ -3,26 +3,21 @@
 
 #include <algorithm>
 #include <chrono>
-#include <iterator>
 #include <optional>
 #include <set>
 #include <string>
-#include <system_error>
 #include <utility>
 #include <vector>
 
 #include "platform/admission/pairauth.h"
-#include "standalone/api/export.h"
 #include "standalone/api/footage.h"
+#include "standalone/api/footage_place.h"
 #include "standalone/api/forward.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
 #include "standalone/binding/rights.h"
 #include "standalone/maintenance/host_status.h"
-#include "standalone/maintenance/mount_folder.h"
 #include "standalone/store/hosts.h"
-#include "standalone/store/mounts.h"
-#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::api {
 
@@ -31,13 +26,6 @@ namespace {
 // How long hosts are asked for a player, one after another; the last may take three seconds more.
 constexpr std::chrono::seconds kMaxSearch{9};
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
-
-// What a call needs that only one host has.
-struct Place {
-    int host_id = 0;  // 0: any
-    Forwarded kind = Forwarded::kFootage;
-    std::string what;
-};
 
 // 0 for what is no number; the handler says what is wrong with it.
 int IdOf(const Call& call, const char* name) {
@@ -48,13 +36,6 @@ int IdOf(const Call& call, const char* name) {
 bool IsLive(const Call& call) {
     const bool shows_camera = IdOf(call, "itemType") == 0 || IdOf(call, "snapshot") == 1;
     return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get");
-}
-
-// As the recorder of this machine sees it.
-bool IsOnline(const std::vector<maintenance::HostStatus>& states, int host) {
-    return std::ranges::any_of(states, [host](const maintenance::HostStatus& status) {
-        return status.host == host && status.state != maintenance::HostState::kOffline;
-    });
 }
 
 // By a session, or as a paired host. Anyone else is refused by this host's handler.
@@ -99,101 +80,6 @@ std::optional<Footage> FootageOf(const Call& call) {
                    : FindFootage(call.Records(), KindOf(call), call.Parameter("event").asInt());
 }
 
-bool IsHere(store::Store& records, const store::Mount& mount) {
-    try {
-        return maintenance::OpenMount(records, mount).has_value();
-    } catch (const std::system_error&) {
-        return false;
-    }
-}
-
-// The hosts that can read the mount; 0 for the only machine.
-std::set<int> HostsWith(store::Store& records, const store::Mount& mount, int own_host) {
-    if (!mount.IsShared()) {
-        return {mount.host_id};
-    }
-    const std::vector<int> known = store::SharedMounts(records).HostsWith(mount.id);
-    std::set<int> hosts(known.begin(), known.end());
-    hosts.erase(own_host);
-    if (IsHere(records, mount)) {
-        hosts.insert(own_host);
-    }
-    return hosts;
-}
-
-// Of several hosts this one, else the first that is online, else the first.
-int Choose(const Call& call, const std::set<int>& hosts, int own_host) {
-    const auto states = maintenance::ReadHostStatus(call.context.Installation());
-    const auto online = std::ranges::find_if(hosts, [&](int host) { return IsOnline(states, host); });
-    return hosts.contains(own_host) ? own_host : online != hosts.end() ? *online : *hosts.begin();
-}
-
-Place PlaceOfFootage(const Call& call, int own_host) {
-    const std::optional<Footage> footage = FootageOf(call);
-    const auto access = call.method == "Download" ? store::CameraAccess::kExport : store::CameraAccess::kPlayback;
-    if (!footage || !binding::MayUse(footage->camera_id, access)) {
-        return {};
-    }
-    const std::string what = "this footage of camera " + std::to_string(footage->camera_id);
-    const auto mount = store::Mounts(call.Records()).Find(footage->mount_id);
-    if (!mount) {
-        return {};
-    }
-    // What grows is flushed, and known to grow, by the host that records it.
-    if (mount->IsShared() && footage->grows && footage->recorder != own_host &&
-        IsOnline(maintenance::ReadHostStatus(call.context.Installation()), footage->recorder)) {
-        return {footage->recorder, Forwarded::kFootage, what};
-    }
-    const std::set<int> hosts = HostsWith(call.Records(), *mount, own_host);
-    if (hosts.empty()) {
-        throw Failure(503, what + " is on the shared mount " + mount->name + ", which no host has now");
-    }
-    return {Choose(call, hosts, own_host), Forwarded::kFootage, what};
-}
-
-std::string NameOfHost(store::Store& records, int id) {
-    const auto host = store::Hosts(records).Find(id);
-    return host ? host->name : "a host that was removed";
-}
-
-// One file is made by one host: of all that is asked for.
-Place PlaceOfExport(const Call& call, int own_host) {
-    std::optional<std::set<int>> with_all;
-    std::set<int> owners;
-    std::string shared;
-    for (const int id : MountsOfExport(call)) {
-        const auto mount = store::Mounts(call.Records()).Find(id);
-        if (!mount) {
-            continue;
-        }
-        const std::set<int> hosts = HostsWith(call.Records(), *mount, own_host);
-        std::set<int> common;
-        std::ranges::set_intersection(with_all.value_or(hosts), hosts, std::inserter(common, common.end()));
-        with_all = std::move(common);
-        if (mount->IsShared()) {
-            shared = mount->name;
-        } else {
-            owners.insert(mount->host_id);
-        }
-    }
-    if (!with_all) {
-        return {};
-    }
-    if (!with_all->empty()) {
-        return {Choose(call, *with_all, own_host), Forwarded::kFootage, "this footage"};
-    }
-    if (owners.size() < 2) {
-        throw Failure(503, "no host that has all of this footage has the shared mount " + shared + " now");
-    }
-    std::string names;
-    for (const int id : owners) {
-        names += (names.empty() ? "" : ", ") + NameOfHost(call.Records(), id);
-    }
-    throw Failure(409,
-                  "this footage lies on several hosts (" + names +
-                      "): export each host's cameras, or for a camera that moved each part of the span, by itself");
-}
-
 Place PlaceOf(const Call& call, int own_host) {
     const bool is_event = call.api == kEventApi.name;
     if (IsLive(call)) {
@@ -205,7 +91,7 @@ Place PlaceOf(const Call& call, int own_host) {
     const bool needs_footage =
         IsPlayer(call) || (call.api == kPictureApi.name && call.method == "At") ||
         (is_event && (call.method == "Frame" || call.method == "Download" || call.method == "Stream"));
-    return needs_footage ? PlaceOfFootage(call, own_host) : Place();
+    return needs_footage ? PlaceOfFootage(call, FootageOf(call), own_host) : Place();
 }
 
 // The hosts that may have a player that does not run here: the one whose stream of it this host forwards, else all

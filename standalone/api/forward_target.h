@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Forwards the calls that another host of the same store has to answer: for a camera's picture to the host that records
-// it, for footage to the one that has its mount, for a player to the one where it runs.
+// it, for footage to one that can read its mount, for a player to the one where it runs.
 //
 // Why so        Sessions, rights, searches and settings come from the store, so every host answers them. Rings and
 //               files are one host's alone.
@@ -13,8 +13,8 @@ namespace lookhaven::api {
 
 // False where this host answers the call itself, also where the caller may not have what it asks for: the refusal is
 // the same everywhere. True when another host has answered it on standard output. Only for an admitted call. Throws
-// Failure: 503 where that host is offline, or the call was forwarded to the wrong one; 409 where parts of what is to be
-// exported lie on several hosts.
+// Failure: 503 where that host is offline, the call was forwarded to the wrong one, or no host has a shared mount; 409
+// where parts of what is to be exported lie on several hosts.
 bool ForwardIfNeeded(const Call& call);
 
 }  // namespace lookhaven::api

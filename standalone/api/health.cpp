@@ -13,11 +13,11 @@
 #include "standalone/control/stream_counters.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/shared_folder.h"
 #include "standalone/store/camera_leases.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
-#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::api {
 
@@ -77,9 +77,7 @@ void CheckCameras(store::Store& records, int host, const std::vector<control::St
 std::optional<std::string> ProblemOf(store::Store& records, const store::Mount& mount) {
     const auto folder = maintenance::OpenMount(records, mount);
     if (!folder) {
-        // A host may do without a shared mount that others have.
-        const bool is_elsewhere = mount.IsShared() && !store::SharedMounts(records).HostsWith(mount.id).empty();
-        return is_elsewhere ? std::nullopt : std::optional<std::string>("its disk is not mounted");
+        return "its disk is not mounted";
     }
     const maintenance::MountSpace space = folder->Space();
     if (space.free_bytes < space.ReserveBytes() || space.free_files < space.ReserveFiles()) {
@@ -101,13 +99,12 @@ void CheckMounts(const base::Installation& installation, store::Store& records, 
             problem = error.what();
         }
         for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
-            const bool is_well = status.state == maintenance::MountState::kReady ||
-                                 (mount.IsShared() && status.state == maintenance::MountState::kNotMounted);
-            if (!problem && status.mount == mount.id && !is_well) {
+            if (!problem && status.mount == mount.id && status.state != maintenance::MountState::kReady) {
                 problem = std::string(maintenance::NameOf(status.state)) + ' ' + status.reason;
             }
         }
-        if (problem) {
+        // A host may do without a shared mount that others have.
+        if (problem && !maintenance::IsOnlyElsewhere(installation, records, mount)) {
             problems.push_back({"mount", mount.id, *problem});
         }
     }

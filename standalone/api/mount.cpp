@@ -25,6 +25,7 @@
 #include "standalone/control/common_config.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/shared_folder.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/hosts.h"
@@ -43,17 +44,16 @@ constexpr double kMaxLimitBytes = 9e15;  // exact in JavaScript
 
 // What all mounts are described by.
 struct MountContext {
-    int host = 0;
+    const base::Installation& installation;
     std::int64_t now_s = base::WallSeconds();
-    std::vector<maintenance::MountStatus> states;  // as the recorder that runs sees them
-    std::vector<store::RecentFootage> recent;
-    std::map<int, std::string> camera_names;
+    std::vector<maintenance::MountStatus> states = {};  // as the recorder that runs sees them
+    std::vector<store::RecentFootage> recent = {};
+    std::map<int, std::string> camera_names = {};
 };
 
 MountContext ReadMountContext(const Call& call) {
     const base::Installation& installation = call.context.Installation();
-    MountContext known;
-    known.host = installation.HostId();
+    MountContext known{installation};
     if (control::FindRecorder(installation) == control::RecorderState::kAlive) {
         known.states = maintenance::ReadMountStatus(installation);
     }
@@ -91,9 +91,12 @@ Condition Inspect(store::Store& records, const store::Mount& mount) {
 }
 
 Condition ConditionOf(store::Store& records, const store::Mount& mount, const MountContext& known) {
-    if (!mount.IsOf(known.host)) {
+    if (!mount.IsOf(known.installation.HostId())) {
         const auto host = store::Hosts(records).Find(mount.host_id);
         return {"other-host", host ? "it is of host " + host->name : "it is of a host that was removed"};
+    }
+    if (maintenance::IsOnlyElsewhere(known.installation, records, mount)) {
+        return {"elsewhere", "not mounted on this host: what is on it comes from the others"};
     }
     Condition condition;
     try {

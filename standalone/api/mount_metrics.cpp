@@ -11,9 +11,9 @@
 #include "standalone/control/mount_counters.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/shared_folder.h"
 #include "standalone/store/events.h"
 #include "standalone/store/mounts.h"
-#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::api {
 
@@ -40,7 +40,8 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
     }
     std::vector<MountFigures> mounts;
     for (const store::Mount& mount : store::Mounts(records).List()) {
-        if (!mount.IsOf(installation.HostId())) {
+        // A host may do without a shared mount that others have.
+        if (!mount.IsOf(installation.HostId()) || maintenance::IsOnlyElsewhere(installation, records, mount)) {
             continue;
         }
         MountFigures& figures = mounts.emplace_back();
@@ -54,8 +55,6 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
                 const auto state = states.find(mount.id);
                 figures.is_up = state == states.end() || state->second == maintenance::MountState::kReady ||
                                 state->second == maintenance::MountState::kKeptFull;
-            } else if (mount.IsShared() && !store::SharedMounts(records).HostsWith(mount.id).empty()) {
-                mounts.pop_back();  // a host may do without one that others have
             }
         } catch (const std::system_error&) {
             figures.is_up = false;  // and why, the health says

@@ -140,9 +140,9 @@ void AddHosts(CLI::App& program, const Console& console) {
         .Option("name", request.name, name, Required);
     group.Add("undrain", "Lets a host take cameras again", Drain<false>).Option("name", request.name, name, Required);
     group.Add("balance", "Distributes the cameras evenly among the hosts", Balance);
-    group.Add("remove", "Removes a host; the recordings on its mounts are left as they are", Remove)
+    group.Add("remove", "Removes a host that is stopped; the recordings on its mounts are left as they are", Remove)
         .Option("name", request.name, name, Required)
-        .Flag("--yes", request.yes, "Also where its mounts hold recordings, which only that host can still play");
+        .Flag("--yes", request.yes, "Also where its own mounts hold recordings, which only that host can still play");
 }
 
 }  // namespace lookhaven::cli

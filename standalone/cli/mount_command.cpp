@@ -159,7 +159,7 @@ void AddMount(CLI::App& program, const Console& console) {
     };
     Command add = group.Add("add", "Adds an existing folder", Add)
                       .Option("path", request.path, "The folder", Required)
-                      .Flag("--shared", request.is_shared, "All hosts may mount it, at this path");
+                      .Flag("--shared", request.is_shared, "Hosts share it: each may mount the folder at this path");
     add_properties(add);
     Command set = group.Add("set", "Changes the given properties of a mount", Change)
                       .Option("id", request.id, "The mount's id", Required)

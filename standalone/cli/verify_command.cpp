@@ -16,6 +16,7 @@
 #include "standalone/maintenance/mount_lock.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/verify.h"
+#include "standalone/store/hosts.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/shared_mounts.h"
 
@@ -55,6 +56,17 @@ std::map<int, std::string> RequireOwnMounts(store::Store& store, const base::Ins
     return unknown;
 }
 
+// Why the shared mount must not be repaired on this host; empty where it may.
+std::string RepairedElsewhere(store::Store& store, const store::Mount& mount, int host) {
+    const int maintainer = store::SharedMounts(store).Lease(mount.id).host_id;
+    if (maintainer == host || (maintainer == 0 && store::Hosts(store).All().size() == 1)) {
+        return "";
+    }
+    const auto other = store::Hosts(store).Find(maintainer);
+    return other ? "run verify --repair on host " + other->name + ", which maintains it"
+                 : "no host maintains it: start the recorder of one that has it, and run verify --repair there";
+}
+
 void Verify(const Console& console, const Request& request) {
     store::Store store = console.OpenStore();
     std::map<int, std::string> left_alone =
@@ -63,10 +75,10 @@ void Verify(const Console& console, const Request& request) {
     for (const store::Mount& mount : store::Mounts(store).List()) {
         if (!mount.IsOf(host)) {
             left_alone[mount.id] = "";
-        } else if (const int maintainer = store::SharedMounts(store).Maintainer(mount.id);
-                   request.repair && mount.IsShared() && maintainer != 0 && maintainer != host) {
-            const auto name = store::Hosts(store).Find(maintainer);
-            left_alone[mount.id] = "it is repaired on the host that maintains it" + (name ? ", " + name->name : "");
+        } else if (request.repair && mount.IsShared()) {
+            if (const std::string where = RepairedElsewhere(store, mount, host); !where.empty()) {
+                left_alone[mount.id] = where;
+            }
         }
     }
     const bool watched = ::isatty(STDERR_FILENO) != 0 && !console.json;

@@ -16,12 +16,12 @@
 #include "standalone/doctor/checks.h"
 #include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_status.h"
+#include "standalone/maintenance/shared_folder.h"
 #include "standalone/store/cameras.h"
 #include "standalone/store/events.h"
 #include "standalone/store/kept_events.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recording_plans.h"
-#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::doctor {
 
@@ -81,16 +81,12 @@ bool IsReadable(const store::Mount& mount) {
     return ::access(mount.path.c_str(), R_OK | X_OK) == 0 && (::access(marker.c_str(), R_OK) == 0 || errno == ENOENT);
 }
 
-bool IsElsewhere(store::Store& store, const store::Mount& mount) {
-    return !store::SharedMounts(store).HostsWith(mount.id).empty() && !maintenance::OpenMount(store, mount);
-}
-
-Findings CheckEnabled(store::Store& store, const store::Mount& mount) {
-    if (mount.IsShared() && IsElsewhere(store, mount)) {
-        return {{Concat("the folder of ", TitleOf(mount),
-                        ", which hosts share, is not there: this host does not record"
-                        " to it, and fetches what is on it from others"),
-                 "mount it at that path, as the others have it, or leave it as it is", Severity::kNote}};
+Findings CheckEnabled(const base::Installation& installation, store::Store& store, const store::Mount& mount) {
+    if (maintenance::IsOnlyElsewhere(installation, store, mount)) {
+        return {
+            {Concat(TitleOf(mount), ", which hosts share, is not mounted here: this host records elsewhere, and plays"
+                                    " what is on it through the others"),
+             Concat("to use it here, mount it at ", Quoted(mount.path)), Severity::kNote}};
     }
     if (::access(mount.path.c_str(), F_OK) != 0) {
         return {{TitleOf(mount) + " is not there",
@@ -158,7 +154,8 @@ Findings CheckMounts(const base::Installation& installation) {
         std::map<int, int> cameras = CountCamerasByMount(store, host);
         for (const store::Mount& mount : mounts) {
             try {
-                std::ranges::move(mount.enabled ? CheckEnabled(store, mount) : CheckDisabled(mount, cameras[mount.id]),
+                std::ranges::move(mount.enabled ? CheckEnabled(installation, store, mount)
+                                                : CheckDisabled(mount, cameras[mount.id]),
                                   std::back_inserter(findings));
             } catch (const std::system_error& error) {
                 findings.push_back({TitleOf(mount) + " fails: " + error.what(), "check the disk"});

@@ -13,6 +13,7 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/base/log.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::maintenance {
 
@@ -33,7 +34,7 @@ std::vector<int> IdsOf(std::span<const store::Event> events) {
 
 void Deletion::Delete(std::span<const store::Event> events) {
     if (!events.empty()) {
-        events_.BeginDeletion(IdsOf(events));
+        Change([&] { events_.BeginDeletion(IdsOf(events)); });
         Finish();
     }
 }
@@ -49,7 +50,7 @@ void Deletion::Finish() {
     } catch (const std::system_error&) {
         // Before any is forgotten: the seconds and marks that they share with others stay.
         failure = std::current_exception();
-        events_.CancelDeletion(IdsOf(std::span(pending).subspan(removed)));
+        Change([&] { events_.CancelDeletion(IdsOf(std::span(pending).subspan(removed))); });
     }
     for (std::span rest = std::span(pending).first(removed); !rest.empty();) {
         const std::span page = rest.first(std::min(rest.size(), kEventsPerBatch));
@@ -58,6 +59,14 @@ void Deletion::Finish() {
     }
     if (failure) {
         std::rethrow_exception(failure);
+    }
+}
+
+void Deletion::Change(const std::function<void()>& change) {
+    if (mount_.IsShared()) {
+        store::SharedMounts(store_).ChangeWithLease(mount_.id, host_, change);
+    } else {
+        change();
     }
 }
 

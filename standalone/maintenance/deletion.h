@@ -9,6 +9,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <span>
 
 #include "standalone/maintenance/mount_folder.h"
@@ -28,18 +29,21 @@ struct DeletionResult {
 
 class Deletion {
   public:
-    // All must outlive this object.
-    Deletion(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s)
+    // host: this machine's, which maintains the mount if that is shared. All must outlive this object.
+    Deletion(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
+             int host = 0)
         : store_(store),
           mount_(mount),
           folder_(folder),
           events_(store),
           marks_(store),
           mounts_(store),
-          now_s_(now_s) {}
+          now_s_(now_s),
+          host_(host) {}
 
     // The events must be on the mount. Throws store::StoreError; std::system_error for trouble with the mount: what is
-    // not deleted by then stays, with its rows.
+    // not deleted by then stays, with its rows. Throws store::LeaseLost once another host maintains a shared mount, which
+    // finishes what is pending.
     void Delete(std::span<const store::Event> events);
 
     // Finishes what is pending deletion: by Delete, or since a crash. Throws as Delete.
@@ -48,6 +52,8 @@ class Deletion {
     const DeletionResult& Result() const { return result_; }  // of all calls
 
   private:
+    // On a shared mount, while this host maintains it.
+    void Change(const std::function<void()>& change);
     void RemoveFile(const store::Event& event);
     // The rows of removed files, and what else tells of them.
     void Forget(std::span<const store::Event> events);
@@ -68,6 +74,7 @@ class Deletion {
     store::Marks marks_;
     store::Mounts mounts_;
     const std::int64_t now_s_;
+    const int host_;
     DeletionResult result_;
 };
 

@@ -39,48 +39,52 @@ bool Try(Work&& work) {
     }
 }
 
-// Whose recordings are recovered here.
-class Responsibility {
+// Which recordings are recovered here.
+class RecoveryScope {
   public:
-    Responsibility(store::Store& store, const store::Mount& mount, int first_reserved_id, const HostShare& share)
+    RecoveryScope(store::Store& store, const store::Mount& mount, int first_reserved_id, const MountRole& role)
         : is_shared_(mount.IsShared()),
           first_reserved_id_(first_reserved_id),
-          share_(share) {
+          role_(role) {
         if (is_shared_) {
             blocks_ = store::Events(store).ReservedBlocks();
             for (const store::Host& host : store::Hosts(store).All()) {
-                hosts_.insert(host.id);
+                existing_hosts_.insert(host.id);
             }
         }
     }
 
-    bool IsOverdue(const store::Event& row) const { return MayHave(row.host_id, row.id); }
+    bool Covers(const store::Event& row) const { return CoversIdOf(row.host_id, row.id); }
 
-    // Of a shared mount only what is known to be of a host: a file without a row may be of one that is away.
-    bool IsOverdue(const archive::FileName& file) const {
+    // On a shared mount only ids whose host is known: a file without a row may belong to a host that is offline.
+    bool Covers(const archive::FileName& file) const {
+        if (!is_shared_) {
+            return file.event < first_reserved_id_;
+        }
         const auto block = std::ranges::find_if(blocks_, [&](const auto& each) { return each.Has(file.event); });
-        return is_shared_ ? block != blocks_.end() && MayHave(block->host_id, file.event)
-                          : file.event < first_reserved_id_;
+        return block != blocks_.end() && CoversIdOf(block->host_id, file.event);
     }
 
   private:
-    bool MayHave(int host, int event) const {
-        return !is_shared_ || host == share_.host ? event < first_reserved_id_
-                                                  : share_.maintains && !hosts_.contains(host);
+    bool CoversIdOf(int host, int event) const {
+        if (!is_shared_ || host == role_.host) {
+            return event < first_reserved_id_;
+        }
+        return role_.is_maintainer && !existing_hosts_.contains(host);
     }
 
     const bool is_shared_;
     const int first_reserved_id_;
-    const HostShare share_;
+    const MountRole role_;
     std::vector<store::EventIdBlock> blocks_;
-    std::set<int> hosts_;  // that there are
+    std::set<int> existing_hosts_;
 };
 
-bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, const Responsibility& own,
+bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, const RecoveryScope& scope,
                   std::int64_t now_s) {
     bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
-        if (file.name.kind == archive::FileKind::kRecording && own.IsOverdue(file.name) &&
+        if (file.name.kind == archive::FileKind::kRecording && scope.Covers(file.name) &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
             is_complete &= Try([&] {
                 const int new_id = events.NextId();
@@ -94,25 +98,25 @@ bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id,
 }  // namespace
 
 bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s,
-             const HostShare& share) {
+             const MountRole& role) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
     if (!folder) {
         return false;
     }
-    if (!mount.IsShared() || share.maintains) {
-        Deletion(store, mount, *folder, now_s).Finish();
+    if (!mount.IsShared() || role.is_maintainer) {
+        Deletion(store, mount, *folder, now_s, role.host).Finish();
     }
     store::Mounts(store).ReserveIds(folder->LastCamera(), 0);
     bool is_complete = true;
     store::Events events(store);
     events.SetMissingOrders(mount.id);
-    const Responsibility own(store, mount, first_reserved_id, share);
+    const RecoveryScope scope(store, mount, first_reserved_id, role);
     for (const store::Event& row : events.Open()) {
-        if (row.mount_id == mount.id && own.IsOverdue(row) && !row.demo) {
+        if (row.mount_id == mount.id && scope.Covers(row) && !row.demo) {
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    return ImportRecent(events, *folder, mount.id, own, now_s) && is_complete;
+    return ImportRecent(events, *folder, mount.id, scope, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

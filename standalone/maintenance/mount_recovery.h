@@ -10,10 +10,10 @@
 
 namespace lookhaven::maintenance {
 
-// What a host has to do with a shared mount; of no account for any other.
-struct HostShare {
+// This host's part in a shared mount; ignored for any other.
+struct MountRole {
     int host = 0;
-    bool maintains = false;  // as in store/shared_mounts.h
+    bool is_maintainer = false;  // as in store/shared_mounts.h
 };
 
 // Finishes deletions, closes the mount's open events after their last good frame, removes rows whose file is missing,
@@ -26,6 +26,6 @@ struct HostShare {
 // from here by what its files look like. The host that maintains it also finishes deletions, and recovers what removed
 // hosts have recorded.
 bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_id, std::int64_t now_s,
-             const HostShare& share = {});
+             const MountRole& role = {});
 
 }  // namespace lookhaven::maintenance

@@ -75,12 +75,13 @@ void TakeExpired(store::Events& events, int mount_id, int camera_id, std::int64_
 
 class Retention {
   public:
-    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, const RetentionClock& clock)
+    Retention(store::Store& store, const store::Mount& mount, const MountFolder& folder, const RetentionClock& clock,
+              int host)
         : mount_(mount),
           folder_(folder),
           cameras_(store),
           events_(store),
-          deletion_(store, mount, folder, clock.now_s),
+          deletion_(store, mount, folder, clock.now_s, host),
           clock_(clock),
           now_s_(clock.now_s),
           applies_age_(clock.age_limit == AgeLimit::kApplies) {}
@@ -234,9 +235,9 @@ RetentionForecast ForecastRetention(store::Store& store, int camera_id, std::int
 }
 
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
-                                DiskWatch& watch) {
+                                DiskWatch& watch, int host) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
-    return folder ? Retention(store, mount, *folder, clock).Run(watch) : DeletionResult{};
+    return folder ? Retention(store, mount, *folder, clock, host).Run(watch) : DeletionResult{};
 }
 
 }  // namespace lookhaven::maintenance

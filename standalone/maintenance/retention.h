@@ -42,9 +42,9 @@ struct DiskWatch {
 // is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says nothing about
 // others: handle each mount by itself, and try again later. The events deleted until then stay deleted. A file of
 // which only the file system's rights or kinds are in the way keeps neither other cameras' ages nor the mount's limits
-// from being enforced; a disk that fails ends the run.
+// from being enforced; a disk that fails ends the run. host: as of Deletion, which throws store::LeaseLost.
 DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
-                                DiskWatch& watch);
+                                DiskWatch& watch, int host = 0);
 
 // What the mount's own limits would have EnforceRetention delete over time, without what a full disk adds.
 struct RetentionForecast {

@@ -69,10 +69,12 @@ class Verification {
             return;
         }
         if (repair_) {
-            Deletion(store_, mount, *folder, base::WallSeconds()).Finish();
+            Deletion(store_, mount, *folder, base::WallSeconds(), host_).Finish();
         }
         for (std::size_t i = 0; i < rows.size(); ++i) {
-            Try([&] { CheckRow(*folder, rows[i]); });
+            if (!MayBeWrittenElsewhere(mount, rows[i])) {
+                Try([&] { CheckRow(*folder, rows[i]); });
+            }
             if (progress_) {
                 progress_(i + 1, rows.size());
             }
@@ -104,15 +106,12 @@ class Verification {
         }
     }
 
-    // Its lock on the file may not be seen here.
-    bool IsWrittenElsewhere(const store::Event& row) {
-        return row.recording && row.host_id != 0 && row.host_id != host_ && store::Hosts(store_).Find(row.host_id);
+    // Another host's lock on the file may not be seen here, so whether it still writes cannot be told.
+    bool MayBeWrittenElsewhere(const store::Mount& mount, const store::Event& row) {
+        return mount.IsShared() && row.recording && row.host_id != host_ && store::Hosts(store_).Find(row.host_id);
     }
 
     void CheckRow(const MountFolder& mount, const store::Event& row) {
-        if (IsWrittenElsewhere(row)) {
-            return;
-        }
         const std::string path = (mount.Path() / row.path).string();
         const std::optional<archive::FileName> name = archive::ParsePath(row.path);
         if (!name || name->event != row.id || name->kind != archive::FileKind::kRecording) {

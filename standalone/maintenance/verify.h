@@ -34,8 +34,8 @@ struct VerifyReport {
 // Reads the head of every frame: about a second for five hours of recordings. progress, when given, is called with the
 // number of events done and of all events, counted separately for each mount. left_alone: mounts by id that must not be
 // touched, and why; each is reported as a fault, but one for which it says nothing, as another host's. host: this
-// machine among the hosts of the store, which leaves what others of them are writing to shared mounts alone. Throws
-// store::StoreError; trouble with one file is reported as a fault.
+// machine among the hosts of the store. On shared mounts it leaves alone what others of them record, also what one of
+// them left open when it crashed. Throws store::StoreError; trouble with one file is reported as a fault.
 VerifyReport Verify(store::Store& store, bool repair,
                     const std::function<void(std::size_t, std::size_t)>& progress = {},
                     const std::map<int, std::string>& left_alone = {}, int host = 0);

@@ -30,8 +30,8 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
         result.mount = mount->path;
         const auto own = mount->IsShared() ? mounts.FindForPlan(0, host) : std::nullopt;
         if (own && own->enabled && !own->IsShared()) {
-            result.own_mount_id = own->id;
-            result.own_mount = own->path;
+            result.fallback_mount_id = own->id;
+            result.fallback_mount = own->path;
         }
     }
     return result;

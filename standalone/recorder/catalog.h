@@ -36,9 +36,9 @@ struct CameraPlan {
     int live_profile = 0;                          // the profile that the live view shows, and …
     base::Codec video_type = base::Codec::kMjpeg;  // … what the store says that it sends
     std::string hours = {};                        // as in store::RecordingPlan
-    // Where a shared mount is planned: where to record while that is not here; 0: nowhere.
-    int own_mount_id = 0;
-    std::filesystem::path own_mount = {};
+    // Where to record while the shared mount of the plan is not mounted here; 0: nowhere.
+    int fallback_mount_id = 0;
+    std::filesystem::path fallback_mount = {};
 };
 
 struct CatalogContents {

@@ -188,8 +188,7 @@ void EventRowQueue::FillReserve(store::Store& store) {
         return;
     }
     const int count = static_cast<int>(std::max<std::size_t>(missing, 1));
-    const int first = host_ == 0 ? store::Events(store).NextIds(count)
-                                 : store::Events(store).ReserveIds(count, host_, base::WallSeconds());
+    const int first = host_ == 0 ? store::Events(store).NextIds(count) : store::Events(store).ReserveIds(count, host_);
     // Told before the first of them is used: verify leaves files with these ids alone.
     if (is_first && !HoldLease(store, first)) {
         return;

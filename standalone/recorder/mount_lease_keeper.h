@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <set>
 
 #include "standalone/recorder/assignment.h"
@@ -13,30 +14,38 @@ namespace lookhaven::recorder {
 
 class MountLeaseKeeper {
   public:
-    // host, offline_us: as in HostWatch.
+    // offline_us: how long a lease may stand still until it is taken over.
     MountLeaseKeeper(int mount_id, int host, std::int64_t offline_us)
         : mount_id_(mount_id),
           host_(host),
+          offline_us_(offline_us),
           watch_(offline_us) {}
 
-    // Call every second while the mount is here. Takes the lease that nobody has, or a host that is offline.
-    void Renew(store::Store& store, std::int64_t now_us);
-    // The mount is not here, or fails here.
+    // Call every second while the folder is mounted here. Renews the lease, or takes it while it is free or stands
+    // still. Throws store::StoreError.
+    void Update(store::Store& store, std::int64_t now_us);
+    // The folder fails here. Throws store::StoreError.
     void GiveUp(store::Store& store);
+    // The store says that another host has it now, or nobody.
+    void NoteLost() { is_held_ = false; }
 
     // As of the last of these calls.
     bool IsHeld() const { return is_held_; }
-    // Whether the lease came, or the set of hosts changed, since this was last asked: what others have left may
-    // be this host's to recover now.
-    bool HasChanged();
+    // Whether the lease was gained, or the set of hosts changed, since the last call: what others have left may be this
+    // host's to recover now. A change of hosts is told late by offline_us, so that one that was removed while it
+    // recorded has noticed.
+    bool TakeChange();
 
   private:
     bool Take(store::Store& store, std::int64_t now_us);
+    void LookAtHosts(store::Store& store, std::int64_t now_us);
 
     const int mount_id_;
     const int host_;
-    HostWatch watch_;
-    std::set<int> hosts_;
+    const std::int64_t offline_us_;
+    HostWatch watch_;      // of the lease's count, as a heartbeat of its holder
+    std::set<int> hosts_;  // that share the store
+    std::optional<std::int64_t> hosts_changed_us_;
     bool is_held_ = false;
     bool has_changed_ = false;
 };

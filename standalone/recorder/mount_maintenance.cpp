@@ -2,6 +2,7 @@
 #include "standalone/recorder/mount_maintenance.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -22,6 +23,13 @@ using maintenance::MountState;
 constexpr std::int64_t kRetentionUs = 10'000'000;
 constexpr std::int64_t kMinPauseUs = 5'000'000;
 constexpr std::int64_t kMaxPauseUs = 600'000'000;
+constexpr std::int64_t kMaxClockDifferenceS = 300;
+
+// Whether retention deletes for lack of space.
+bool IsShort(const maintenance::MountFolder& folder) {
+    const maintenance::MountSpace space = folder.Space();
+    return space.free_bytes < 2 * space.ReserveBytes();
+}
 
 }  // namespace
 
@@ -63,36 +71,39 @@ void MountMaintenance::Work(store::Store& store) {
     if (now_us < after_failure_.until_us) {
         return;
     }
+    const std::optional<store::Mount> mount = store::Mounts(store).Find(mount_id_);
+    if (!mount) {
+        return;
+    }
     try {
-        const std::optional<store::Mount> mount = store::Mounts(store).Find(mount_id_);
-        if (mount) {
-            Maintain(store, *mount, clock);
-        }
+        Maintain(store, *mount, clock);
         after_failure_ = {};
     } catch (const store::StoreError&) {
         throw;
     } catch (const std::exception& failure) {
         after_failure_.Begin(now_us);
         SetStatus(MountState::kFailing, failure.what());
-        // The folder may fail on this host alone.
-        lease_.GiveUp(store);
+        if (mount->IsShared()) {
+            lease_.GiveUp(store);  // the folder may fail on this host alone
+        }
     }
 }
 
 void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, const Clock& clock) {
-    const bool is_there = maintenance::OpenMount(store, mount).has_value();
+    std::string why_not = mount.path;
+    const std::optional<maintenance::MountFolder> folder = Open(store, mount, why_not);
     if (mount.IsShared()) {
-        store::SharedMounts(store).NotePresence(mount.id, context_.host, is_there);
+        store::SharedMounts(store).SetPresence(mount.id, context_.host, folder.has_value());
     }
-    if (!is_there) {
-        SetStatus(MountState::kNotMounted, mount.path);
+    if (!folder) {
+        SetStatus(MountState::kNotMounted, why_not);
         must_recover_ = true;  // whatever is mounted later
         is_recovered_ = mount.IsShared();
-        lease_.GiveUp(store);
+        lease_.NoteLost();
         lock_.Release();
         return;
     }
-    if (!MayMaintain(store, mount)) {
+    if (!Acquire(store, mount)) {
         SetStatus(MountState::kInUse, mount.path);
         return;
     }
@@ -100,24 +111,54 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const std::int64_t now_us = context_.monotonic_us();
     maintenance::CompleteMarks(store, mount.id, clock.now_s, context_.is_complete);
     const int space_requests = context_.space_requests;
-    const bool is_kept_elsewhere = mount.IsShared() && !lease_.IsHeld();
-    if (is_kept_elsewhere) {
-        disk_watch_ = maintenance::DiskWatch();
+    const bool is_maintained_elsewhere = mount.IsShared() && !lease_.IsHeld();
+    if (is_maintained_elsewhere) {
+        // Whether space comes back is the maintaining host's to see. One that takes over begins with one recording.
+        disk_watch_ = {maintenance::SpaceWatch(true), maintenance::SpaceWatch(true)};
         is_full_of_kept_ = false;
-    } else if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests) {
+    } else if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests ||
+               (mount.IsShared() && IsShort(*folder))) {  // of other hosts' full disks nothing is heard here
         next_retention_us_ = now_us + kRetentionUs;
         EnforceRetention(store, mount, clock);
         is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
     }
     if (!recovery_failure_.empty()) {
         SetStatus(MountState::kFailing, recovery_failure_);
-    } else if (disk_watch_.IsHeld()) {
+    } else if (disk_watch_.IsHeld() && !is_maintained_elsewhere) {
         SetStatus(MountState::kSpaceHeld, mount.path);
     } else if (is_full_of_kept_) {
         SetStatus(MountState::kKeptFull, mount.path);
     } else {
         SetStatus(MountState::kReady, "");
     }
+}
+
+// A shared mount that cannot be opened here is not here: other hosts may have it.
+std::optional<maintenance::MountFolder> MountMaintenance::Open(store::Store& store, const store::Mount& mount,
+                                                               std::string& why_not) {
+    try {
+        return maintenance::OpenMount(store, mount);
+    } catch (const std::system_error& error) {
+        if (!mount.IsShared()) {
+            throw;
+        }
+        why_not = error.what();
+        return std::nullopt;
+    }
+}
+
+// By age, a host whose clock is wrong would delete what others have recorded today.
+bool MountMaintenance::AgreesWithStore(store::Store& store, const store::Mount& mount, const Clock& clock) {
+    if (!mount.IsShared()) {
+        return true;
+    }
+    const bool agrees = std::abs(store::SharedMounts(store).ServerTimeS() - clock.now_s) <= kMaxClockDifferenceS;
+    if (std::exchange(agrees_with_store_, agrees) && !agrees) {
+        base::LogWarning("mount " + std::to_string(mount.id) +
+                         ": maximum ages wait, because this host's clock is more"
+                         " than five minutes off that of the store's server");
+    }
+    return agrees;
 }
 
 void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock) {
@@ -131,11 +172,15 @@ void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount&
     };
     try {
         store::FootageRemovals(store).BeginDeletions();
-        deleted = maintenance::EnforceRetention(
-            store, mount,
-            {clock.now_s, clock.is_trusted ? maintenance::AgeLimit::kApplies : maintenance::AgeLimit::kWaits,
-             context_.monotonic_us()},
-            disk_watch_);
+        deleted = maintenance::EnforceRetention(store, mount,
+                                                {clock.now_s,
+                                                 clock.is_trusted && AgreesWithStore(store, mount, clock)
+                                                     ? maintenance::AgeLimit::kApplies
+                                                     : maintenance::AgeLimit::kWaits,
+                                                 context_.monotonic_us()},
+                                                disk_watch_, context_.host);
+    } catch (const store::LeaseLost&) {
+        lease_.NoteLost();
     } catch (...) {
         count(1);
         throw;
@@ -147,15 +192,15 @@ void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount&
     }
 }
 
-// A mount that is not shared is locked. Of a shared one whatever concerns this host's own recordings is done here, and
-// all else by the host that maintains it.
-bool MountMaintenance::MayMaintain(store::Store& store, const store::Mount& mount) {
+// Locks a mount of one host: false while another recorder has it. Of a shared mount, looks who has the lease: without
+// it, only this host's own recordings are recovered here.
+bool MountMaintenance::Acquire(store::Store& store, const store::Mount& mount) {
     if (!mount.IsShared()) {
         return lock_.Hold(mount.path);
     }
     lock_.Release();
-    lease_.Renew(store, context_.monotonic_us());
-    must_recover_ |= lease_.HasChanged();
+    lease_.Update(store, context_.monotonic_us());
+    must_recover_ |= lease_.TakeChange();
     return true;
 }
 

@@ -17,6 +17,7 @@
 #include "standalone/control/mount_counters.h"
 #include "standalone/maintenance/clock_watch.h"
 #include "standalone/maintenance/marks.h"
+#include "standalone/maintenance/mount_folder.h"
 #include "standalone/maintenance/mount_lock.h"
 #include "standalone/maintenance/mount_status.h"
 #include "standalone/maintenance/retention.h"
@@ -34,8 +35,8 @@ struct MaintenanceContext {
     const std::atomic<int>& space_requests;  // grows when a disk is full
     std::function<std::int64_t()> monotonic_us = base::MonotonicMicros;
     std::function<std::int64_t()> wall_s = base::WallSeconds;
-    int host = 0;                          // as in RecorderLeaseKeeper
-    std::int64_t offline_us = 30'000'000;  // as in HostWatch
+    int host = 0;                 // this machine among store/hosts.h; 0: the only one
+    std::int64_t offline_us = 0;  // as in HostWatch
 };
 
 class MountMaintenance {
@@ -50,7 +51,8 @@ class MountMaintenance {
     maintenance::MountStatus Status() const;
     // Since this object was made.
     control::MountCounters Counters() const;
-    // What an earlier recorder of this host left on the mount is finished; also while a shared mount is not here.
+    // Whether nothing is left to recover here from an earlier recorder of this host; true also while a shared mount is
+    // not mounted here, since cameras are recorded elsewhere meanwhile.
     bool IsRecovered() const { return is_recovered_; }
 
     // As in StoreThread.
@@ -75,7 +77,9 @@ class MountMaintenance {
     void Work(store::Store& store);
     void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
-    bool MayMaintain(store::Store& store, const store::Mount& mount);
+    std::optional<maintenance::MountFolder> Open(store::Store& store, const store::Mount& mount, std::string& why_not);
+    bool AgreesWithStore(store::Store& store, const store::Mount& mount, const Clock& clock);
+    bool Acquire(store::Store& store, const store::Mount& mount);
     void Recover(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
 
@@ -87,12 +91,13 @@ class MountMaintenance {
     maintenance::ClockWatch clock_watch_;
     maintenance::MountLock lock_;  // of a mount that is not shared
     MountLeaseKeeper lease_;       // of one that is
-    bool must_recover_ = true;
+    bool must_recover_ = true;     // at the next pass, also where nothing of an earlier recorder is left
     maintenance::DiskWatch disk_watch_;
     Pause after_failure_;
     Pause after_recovery_;
     std::int64_t next_retention_us_ = 0;
     bool is_full_of_kept_ = false;
+    bool agrees_with_store_ = true;
     int seen_space_requests_ = 0;
 
     std::atomic<bool> is_recovered_ = false;

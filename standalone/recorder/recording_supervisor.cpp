@@ -31,7 +31,6 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds host_offline_limit)
     : installation_(installation),
       no_data_limit_(no_data_limit),
-      host_offline_limit_(host_offline_limit),
       flush_requests_(installation),
       camera_status_(installation),
       mount_counters_(installation),
@@ -45,6 +44,9 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                          ? nullptr
                          : std::make_unique<CameraLeaseKeeper>(installation, rows_,
                                                                std::chrono::microseconds(host_offline_limit).count())),
+      mounts_(
+          installation, host_offline_limit, [this] { return rows_.FirstReservedId(); },
+          [this](const store::Mark& mark) { return FootageHasEnded(mark); }),
       missed_marks_(installation.StoreUrl(), "look for marks without footage",
                     [this](store::Store& store, const std::stop_token&) {
                         maintenance::CompleteMarks(store, 0, base::WallSeconds(), [this](const store::Mark& mark) {
@@ -52,17 +54,7 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                             return (!camera_leases_ || base::WallSeconds() >= mark.end_s + kFootageElsewhereS) &&
                                    !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
                         });
-                    }) {
-    try {
-        for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
-            if (status.state == maintenance::MountState::kSpaceHeld) {
-                held_mounts_.insert(status.mount);
-            }
-        }
-    } catch (const std::exception& failure) {
-        base::LogWarning(std::string("cannot read what the previous recorder reported of mounts: ") + failure.what());
-    }
-}
+                    }) {}
 
 // The cameras that a pending mark needs footage of now, and until when.
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
@@ -116,15 +108,7 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
         }
         entry->second.stream = {camera, plan.stream};
         RecordingRequest request{plan, marked.contains(camera) ? marked.at(camera) : 0};
-        if (const auto mount = mounts_.find(plan.mount_id); mount != mounts_.end()) {
-            const maintenance::MountState state = mount->second->Status().state;
-            if (state == maintenance::MountState::kInUse) {
-                request.plan.mount_id = 0;
-            } else if (state == maintenance::MountState::kNotMounted && plan.own_mount_id != 0) {
-                request.plan.mount_id = plan.own_mount_id;
-                request.plan.mount = plan.own_mount;
-            }
-        }
+        mounts_.Redirect(request.plan);
         entry->second.worker->SetRequest(request);
     }
     if (camera_leases_) {
@@ -136,13 +120,14 @@ void RecordingSupervisor::Reconcile(const CatalogContents& catalog) {
     if (entries_.size() > cameras) {
         rows_.Refresh(entries_.size());  // at once, so that a camera's first event need not wait for its id
     }
-    ReconcileMounts(catalog);
+    mounts_.Reconcile(catalog);
     AnswerFlushes();
 }
 
 void RecordingSupervisor::StartRecording(const control::LiveStream& stream) {
-    Start("recording of camera " + std::to_string(stream.camera), [&] {
-        const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis, [this] { ++space_requests_; },
+    starts_.Try("recording of camera " + std::to_string(stream.camera), [&] {
+        const RecorderContext context{rows_, base::MonotonicMicros, base::WallMillis,
+                                      [this] { mounts_.RequestSpace(); },
                                       std::chrono::microseconds(no_data_limit_).count()};
         entries_.emplace(stream.camera,
                          Entry{stream, std::make_unique<RecordingWorker>(stream.camera, context, flush_requests_)});
@@ -167,14 +152,10 @@ void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signa
     for (const auto& [camera, entry] : entries_) {
         recorded.emplace(camera, entry.worker->State());
     }
+    mounts_.Ask();
+    mount_counters_.Write(mounts_.Counters());
     StatusPublisher::States states;
-    std::vector<control::MountCounters> counters;
-    for (const auto& [id, mount] : mounts_) {
-        mount->Ask();
-        states.mounts.push_back(mount->Status());
-        counters.push_back(mount->Counters());
-    }
-    mount_counters_.Write(counters);
+    states.mounts = mounts_.States();
     if (camera_leases_) {
         std::map<int, std::uint64_t> received;
         for (const auto& [camera, signal] : signals) {
@@ -225,9 +206,7 @@ void RecordingSupervisor::RequestStop() {
         camera_leases_->RequestStop();
     }
     status_publisher_.RequestStop();
-    for (const auto& [id, mount] : mounts_) {
-        mount->RequestStop();
-    }
+    mounts_.RequestStop();
     for (auto& [camera, entry] : entries_) {
         entry.is_ending = true;
         entry.worker->RequestStop();
@@ -242,37 +221,7 @@ bool RecordingSupervisor::HasEnded() {
         rows_.RequestStop();
     }
     return rows_.HasEnded() && (!camera_leases_ || camera_leases_->HasEnded()) && missed_marks_.HasEnded() &&
-           status_publisher_.HasEnded() &&
-           std::ranges::all_of(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
-}
-
-// Starts and stops the maintenance of the mounts to match the catalog.
-void RecordingSupervisor::ReconcileMounts(const CatalogContents& catalog) {
-    std::erase_if(mounts_, [](const auto& entry) { return entry.second->HasEnded(); });
-    bool are_recovered = catalog.is_read;
-    for (const auto& [id, mount] : mounts_) {
-        if (!catalog.mounts.contains(id)) {
-            mount->RequestStop();
-        }
-    }
-    for (const auto& [id, is_enabled] : catalog.mounts) {
-        if (!mounts_.contains(id)) {
-            Start("maintenance of mount " + std::to_string(id), [&, id = id] {
-                MaintenanceContext context{
-                    .store_url = installation_.StoreUrl(),
-                    .first_reserved_id = [this] { return rows_.FirstReservedId(); },
-                    .is_complete = [this](const store::Mark& mark) { return FootageHasEnded(mark); },
-                    .space_requests = space_requests_,
-                    .host = installation_.HostId(),
-                    .offline_us = std::chrono::microseconds(host_offline_limit_).count()};
-                mounts_.emplace(id,
-                                std::make_unique<MountMaintenance>(id, std::move(context), held_mounts_.contains(id)));
-            });
-        }
-        const auto mount = mounts_.find(id);
-        are_recovered &= !is_enabled || (mount != mounts_.end() && mount->second->IsRecovered());
-    }
-    are_mounts_recovered_ = are_recovered;
+           status_publisher_.HasEnded() && mounts_.HasEnded();
 }
 
 // Whether no more rows will come, neither from this recorder nor from files that an earlier one left on a mount.
@@ -284,25 +233,12 @@ bool RecordingSupervisor::FootageHasEnded(const store::Mark& mark) const {
         return false;  // another host may record more of it
     }
     const std::optional<PendingMark> pending = rows_.FindPendingMark(mark.id);
-    return pending && (are_mounts_recovered_ || mark.start_s > started_s_) &&
+    return pending && (mounts_.AreRecovered() || mark.start_s > started_s_) &&
            rows_.HasStored(mark.camera_id, pending->record_until_s);
 }
 
 bool RecordingSupervisor::IsHeldElsewhere(int camera) const {
     return camera_leases_ && camera_leases_->IsHeldElsewhere(camera);
-}
-
-// A thread that cannot be started affects that camera or mount alone, and is retried. Each reason is logged once.
-template <class Work>
-void RecordingSupervisor::Start(const std::string& what, Work&& start) {
-    try {
-        start();
-        reported_failures_.erase(what);
-    } catch (const std::exception& failure) {
-        if (std::exchange(reported_failures_[what], failure.what()) != failure.what()) {
-            base::LogError("cannot start the " + what + ": " + failure.what());
-        }
-    }
 }
 
 }  // namespace lookhaven::recorder

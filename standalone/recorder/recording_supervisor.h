@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Starts and stops the recording of every camera and the maintenance of every mount.
+// Starts and stops the recording of every camera.
 //
 // Thread safety One thread; no call waits for a disk or the store.
 #pragma once
@@ -17,8 +17,9 @@
 #include "standalone/control/stream_counters.h"
 #include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/camera_status_tracker.h"
-#include "standalone/recorder/mount_maintenance.h"
+#include "standalone/recorder/mount_supervisor.h"
 #include "standalone/recorder/recording_worker.h"
+#include "standalone/recorder/start_attempts.h"
 #include "standalone/recorder/status_publisher.h"
 
 namespace lookhaven::recorder {
@@ -58,15 +59,11 @@ class RecordingSupervisor {
     std::map<int, std::int64_t> MarkedCameras(const CatalogContents& catalog) const;
     void StartRecording(const control::LiveStream& stream);
     void AnswerFlushes();
-    void ReconcileMounts(const CatalogContents& catalog);
     bool FootageHasEnded(const store::Mark& mark) const;
     bool IsHeldElsewhere(int camera) const;
-    template <class Work>
-    void Start(const std::string& what, Work&& start);
 
     const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
-    const std::chrono::milliseconds host_offline_limit_;
     control::FlushRequests flush_requests_;
     CameraStatusTracker camera_status_;
     control::MountCountersWriter mount_counters_;
@@ -74,12 +71,9 @@ class RecordingSupervisor {
     EventRowQueue rows_;
     std::unique_ptr<CameraLeaseKeeper> camera_leases_;  // null on a single machine
     const std::int64_t started_s_ = base::WallSeconds();
-    std::atomic<int> space_requests_ = 0;
-    std::atomic<bool> are_mounts_recovered_ = false;
-    std::map<std::string, std::string> reported_failures_;
+    MountSupervisor mounts_;  // its threads call FootageHasEnded, which uses those above
+    StartAttempts starts_;
     std::map<int, Entry> entries_;
-    std::set<int> held_mounts_;                                // mounts whose space did not come back, at the start
-    std::map<int, std::unique_ptr<MountMaintenance>> mounts_;  // by id
     StoreThread missed_marks_;
     bool stores_last_rows_ = false;
 };

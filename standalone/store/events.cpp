@@ -21,7 +21,7 @@ namespace {
 
 constexpr std::size_t kMaxPathBytes = 1024;
 constexpr std::size_t kMaxCodecBytes = 32;
-constexpr std::int64_t kBlockDays = 3;  // longer than the two calendar days that recovery looks at
+constexpr int kBlocksOfHost = 4096;
 constexpr int kRowsPerBatch = 10'000;
 constexpr int kMovedRowsPerBatch = 1'000;
 
@@ -82,14 +82,15 @@ int Events::NextIds(int count) {
     return connection_.Write([&](soci::session& sql) { return store::NextIds(sql, "event", count); });
 }
 
-int Events::ReserveIds(int count, int host, std::int64_t now_s) {
+int Events::ReserveIds(int count, int host) {
     return connection_.Write([&](soci::session& sql) {
         const int first = store::NextIds(sql, "event", count);
-        Execute(sql, "delete from event_id_blocks where host_id = :host and reserved_s < :before", host,
-                now_s - kBlockDays * 86'400);
+        Execute(sql, "insert into event_id_blocks (first_id, ids, host_id) values (:first, :ids, :host)", first, count,
+                host);
         Execute(sql,
-                "insert into event_id_blocks (first_id, ids, host_id, reserved_s) values (:first, :ids, :host, :now)",
-                first, count, host, now_s);
+                "delete from event_id_blocks where host_id = :host and first_id <= (select first_id"
+                " from event_id_blocks where host_id = :same order by first_id desc limit 1 offset :blocks)",
+                host, host, kBlocksOfHost);
         return first;
     });
 }

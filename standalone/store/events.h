@@ -129,8 +129,9 @@ class Events {
     // The first of that many consecutive ids; for the recorder, which must be able to begin events while the store is
     // away.
     int NextIds(int count);
-    // The same for events that the host records, which ReservedBlocks names for three days from then on.
-    int ReserveIds(int count, int host, std::int64_t now_s);
+    // The same, and notes them as a block of the host's, which records the events.
+    int ReserveIds(int count, int host);
+    // The last 4,096 of each host, also of those that were removed.
     std::vector<EventIdBlock> ReservedBlocks();
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.

@@ -124,7 +124,8 @@ bool Marks::Save(int id, int mount_id, const std::string& path) {
 }
 
 bool Marks::Miss(int id) {
-    return connection_.Execute("update marks set state = :state where id = :id", MarkState::kMissed, id) > 0;
+    return connection_.Execute("update marks set state = :state where id = :id and state = :pending",
+                               MarkState::kMissed, id, MarkState::kPending) > 0;
 }
 
 bool Marks::Remove(int id) {

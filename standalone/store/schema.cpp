@@ -261,7 +261,7 @@ constexpr const char* kLoads[] = {
     "alter table hosts add column processors integer not null default 0",
 };
 
-// A shared mount has no host's number but -1, which programs that do not know it take for that of another host.
+// A shared mount has host_id -1, which older programs take for another host's.
 constexpr const char* kSharedMounts[] = {
     // The host that records the event; 0 where programs do not say it.
     "alter table events add column host_id integer not null default 0",
@@ -269,10 +269,10 @@ constexpr const char* kSharedMounts[] = {
     ("create table shared_mount_hosts (mount_id integer not null references mounts (id) on delete cascade,"
      " host_id integer not null references hosts (id) on delete cascade, primary key (mount_id, host_id))"),
     ("create table mount_leases (mount_id integer not null primary key references mounts (id) on delete cascade,"
-     " host_id integer not null references hosts (id) on delete cascade)"),
+     " host_id integer not null references hosts (id) on delete cascade, count bigint not null default 0)"),
     // No reference to hosts: what one that was removed has recorded is still to be recovered.
     ("create table event_id_blocks (first_id integer not null primary key, ids integer not null,"
-     " host_id integer not null, reserved_s bigint not null)"),
+     " host_id integer not null)"),
 };
 
 constexpr Migration kMigrations[] = {

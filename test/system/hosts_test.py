@@ -228,12 +228,16 @@ class HostsTest(unittest.TestCase):
 
     def test_footage_on_a_shared_mount_is_read_where_it_is_asked_for(self):
         def ask():
+            """The answer, and whether it was forwarded: a request is logged after it was answered, and later ones then."""
             before = len(access_log.read_text())
             answer = self.other.request(picture_at(self.event), "viewer")
+            self.owner.request("", method="PUT")
+            wait_until(lambda: "/error/method" in access_log.read_text()[before:], 10, "the requests are in the log")
             return answer, "POST" in access_log.read_text()[before:]
 
         access_log = self.owner.home / "log/access.log"
-        (path, mount), direct = self.sql("select path || '|' || id from mounts").split("|"), ask()
+        path, mount = self.sql("select path || '|' || id from mounts").split("|")
+        direct = ask()
         self.assertTrue(direct[1], "it is fetched while the mount is one host's")
         self.addCleanup(self.sql, f"update mounts set host_id = 1, path = '{path}'")
         self.sql("update mounts set host_id = -1")
@@ -242,7 +246,7 @@ class HostsTest(unittest.TestCase):
         self.sql("update mounts set path = '/nowhere'")
         answer, is_forwarded = ask()
         self.assertEqual((answer.status, is_forwarded), (503, False))
-        self.assertRegex(answer.json["error"]["message"], "shared mount .*, which no host has now")
+        self.assertRegex(answer.json["error"]["message"], "shared mount .*, which is not mounted on any host")
         self.sql(f"insert into shared_mount_hosts (mount_id, host_id) values ({mount}, 1)")
         self.assertTrue(ask()[1], "a host says that it has it")
 

@@ -20,7 +20,7 @@ export interface MountRecord extends Omit<MountSettings, "limitBytes" | "limitDa
   id: number;
   revision: number;
   path: string;
-  /** Several hosts have it. */
+  /** Hosts share it. */
   shared: boolean;
   state: string;
   /** What is wrong, as a sentence; may be empty. */

@@ -15,6 +15,7 @@
 #include "standalone/store/hosts.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
+#include "standalone/store/shared_mounts.h"
 #include "test/component/cli/program.h"
 #include "test/support/postgres/temporary_postgres.h"
 
@@ -88,7 +89,13 @@ TEST_F(CliHostsTest, TheFirstOneKeepsItsMountsAndOthersAddTheirOwn) {
     std::filesystem::create_directory(folder_ / "all");
     Play({{"mount add " + (folder_ / "all").string() + " --shared", 0, "Added mount all"},
           {"mount list", 0, "default shared"}});
-    EXPECT_EQ(store::Mounts(store()).List().back().host_id, store::kAllHosts);
+    const store::Mount shared = store::Mounts(store()).List().back();
+    EXPECT_EQ(shared.host_id, store::kAllHosts);
+    store::SharedMounts(store()).SetPresence(shared.id, first, true);
+    std::filesystem::create_directory(folder_ / "bare");
+    Play({{"mount set " + std::to_string(shared.id) + " --path " + (folder_ / "bare").string() + " --take-over", 66,
+           "not marked as the shared mount"},
+          {"verify --repair", 1, "no host maintains it"}});
 }
 
 TEST_F(CliHostsTest, CamerasAreFixedDrainedAndBalanced) {

@@ -42,7 +42,7 @@ TEST_F(MountsTest, MountsAreAddedChangedAndForgotten) {
     const std::ofstream file(folder_ / "file");
     Play({{"mount add " + (folder_ / "none").string(), 66, "no folder"},
           {"mount add " + (folder_ / "file").string(), 66, "no folder"},
-          {"mount add " + disk + " --shared", 65, "share mounts: see lookhaven host add"},
+          {"mount add " + disk + " --shared", 65, "a shared mount needs hosts"},
           {"mount add " + disk + " --limit 1.5T --max-age 30d", 0, "Added mount disk with id"},
           {"mount add " + (folder_ / "link").string() + " --name other", 65, "belongs to mount 2"},
           {"mount add " + (folder_ / "link").string() + " --name other --take-over", 65, "inside each other"},

@@ -36,7 +36,7 @@ class RecoveryTest : public testing::Test {
         store::Events events(footage_.Records());
         for (int camera = 1; camera <= kEvents; ++camera) {
             store::Event row;
-            row.id = events.ReserveIds(1, camera, kStartS);
+            row.id = events.ReserveIds(1, camera);
             row.camera_id = row.host_id = camera;
             row.mount_id = footage_.MountId();
             row.start_s = row.end_s = kStartS;
@@ -52,10 +52,10 @@ class RecoveryTest : public testing::Test {
         }
     }
 
-    bool Run(const HostShare& share = {}) {
+    bool Run(const MountRole& role = {}) {
         const test::OrdinaryUser user;
         const store::Mount mount = store::Mounts(footage_.Records()).Find(footage_.MountId()).value();
-        return Recover(footage_.Records(), mount, 1000, kStartS + 3600, share);
+        return Recover(footage_.Records(), mount, 1000, kStartS + 3600, role);
     }
 
     fs::path FileOf(int event) { return footage_.FileOf(event); }
@@ -119,30 +119,21 @@ TEST_F(RecoveryTest, WhatIsWrongWithOneFileCostsThatFileAlone) {
 
 TEST_F(RecoveryTest, OfASharedMountEachHostRecoversItsOwnAndTheMaintainerWhatRemovedOnesHaveLeft) {
     store::Hosts hosts(footage_.Records());
-    store::Mounts mounts(footage_.Records());
-    for (const char* name : {"nvr1", "nvr2", "nvr3"}) {
-        hosts.Add({.name = name,
-                   .address = "nvr.example",
-                   .port = 8443,
-                   .certificate = "-----BEGIN CERTIFICATE-----\nMII=\n-----END CERTIFICATE-----\n"});
-    }
-    store::Mount mount = mounts.Find(footage_.MountId()).value();
-    mount.host_id = store::kAllHosts;
-    mounts.Update(mount);
+    footage_.ShareMount(3);
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "oco");
-    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
+    EXPECT_TRUE(Run({.host = 2, .is_maintainer = true}));
     EXPECT_EQ(Rows(), "oco") << "they may be cut off from the store, and write on";
     hosts.Remove(1);
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "oco");
-    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
+    EXPECT_TRUE(Run({.host = 2, .is_maintainer = true}));
     EXPECT_EQ(Rows(), "cco");
     store::Events(footage_.Records())
         .Remove(std::array{1, 2, 3});  // files without rows: by the host that has reserved their ids
     EXPECT_TRUE(Run({.host = 2}));
     EXPECT_EQ(Rows(), "-c-");
-    EXPECT_TRUE(Run({.host = 2, .maintains = true}));
+    EXPECT_TRUE(Run({.host = 2, .is_maintainer = true}));
     EXPECT_EQ(Rows(), "cc-");
 }
 

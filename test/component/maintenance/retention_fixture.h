@@ -28,11 +28,12 @@ class RetentionTest : public testing::Test {
   protected:
     RetentionTest() { MountFolder::WriteMarker(footage_.Mount(), MarkerFor(footage_.Records(), footage_.MountId())); }
 
-    DeletionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies) {
+    DeletionResult Run(std::int64_t max_bytes, std::int64_t max_age_s = 0, AgeLimit age_limit = AgeLimit::kApplies,
+                       int host = 0) {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
-        return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_);
+        return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_, host);
     }
 
     void LimitAge(int camera, std::int64_t max_age_s) {

@@ -12,6 +12,7 @@
 #include "standalone/maintenance/verify.h"
 #include "standalone/store/kept_events.h"
 #include "standalone/store/marks.h"
+#include "standalone/store/shared_mounts.h"
 #include "test/component/maintenance/retention_fixture.h"
 #include "test/support/ordinary_user.h"
 
@@ -41,6 +42,17 @@ TEST_F(RetentionTest, TheOldestGoWithTheirFilesUntilTheLimitIsKept) {
     ASSERT_TRUE(archive::ReadRecordingLog(footage_.Mount() / "1", kNoon + 100, log));
     EXPECT_EQ(std::count(log.begin(), log.begin() + 60, 0), 60) << "no footage is logged for deleted recordings";
     EXPECT_EQ(std::count(log.begin() + 60, log.end(), 0), 0);
+}
+
+TEST_F(RetentionTest, OfASharedMountTheHostThatHasItsLeaseAloneDeletes) {
+    const int old = footage_.Record(1, kNoon, 60);
+    const int young = footage_.Record(1, kNoon + 100, 60);
+    footage_.ShareMount(2);
+    store::SharedMounts(footage_.Records()).TakeFree(footage_.MountId(), 1);
+    EXPECT_THROW(Run(kEventBytes, 0, AgeLimit::kApplies, 2), store::LeaseLost);
+    EXPECT_THAT(Left(), ElementsAre(old, young));
+    EXPECT_EQ(Run(kEventBytes, 0, AgeLimit::kApplies, 1).events, 1);
+    EXPECT_THAT(Left(), ElementsAre(young));
 }
 
 TEST_F(RetentionTest, AgeCountsFromAnEventsEnd) {

@@ -156,26 +156,37 @@ TEST_F(HostsTest, OneHostMaintainsASharedMountAndEachRecoversWhatItHasRecorded) 
         return shared.HostsWith(mount).size() == 2 && open.size() == 2 &&
                std::ranges::all_of(open, [&](const store::Event& event) { return event.mount_id == mount; });
     }));
-    const int maintainer = shared.Maintainer(mount);
+    const int maintainer = shared.Lease(mount).host_id;
     ASSERT_TRUE(maintainer == 1 || maintainer == 2);
     const int other = 3 - maintainer;
     const int left_open = OpenEventOf(cameras[maintainer - 1]);
     const int growing = OpenEventOf(cameras[other - 1]);
     machines_[maintainer - 1].Stop(SIGKILL);
     ASSERT_TRUE(Eventually(
-        kLimit, [&] { return machines_[other - 1].Log().find("maintains the shared mount") != std::string::npos; }));
-    EXPECT_EQ(shared.Maintainer(mount), other);
+        kLimit, [&] { return machines_[other - 1].Log().find("this host maintains it now") != std::string::npos; }));
+    EXPECT_EQ(shared.Lease(mount).host_id, other);
     const auto find = [&](int event) { return *store::Events(store_).Find(event); };
     const fs::path file = folder / find(left_open).path;
     machines_[maintainer - 1].Start();
     ASSERT_TRUE(Eventually(kLimit, [&] { return !find(left_open).recording; }));
-    EXPECT_EQ(shared.Maintainer(mount), other) << "it stays";
+    EXPECT_EQ(shared.Lease(mount).host_id, other) << "it stays";
     EXPECT_GT(find(left_open).frame_count, 0);
     EXPECT_EQ(OpenEventOf(cameras[other - 1]), growing) << "what the other is writing is no lost recording";
     store::Mount limited = *mounts.Find(mount);
     limited.max_bytes = 1;
     mounts.Update(limited);
     EXPECT_TRUE(Eventually(kLimit, [&] { return !fs::exists(file); }));
+    EXPECT_EQ(machines_[maintainer - 1].Log().find("old events"), std::string::npos) << "it deletes nothing any more";
+    const auto are_on_shared = [&](bool are) {
+        const auto open = store::Events(store_).Open();
+        return open.size() == 2 &&
+               std::ranges::all_of(open, [&](const store::Event& event) { return (event.mount_id == mount) == are; });
+    };
+    const fs::path away = folder.Path().string() + ".away";
+    fs::rename(folder.Path(), away);
+    EXPECT_TRUE(Eventually(kLimit, [&] { return are_on_shared(false); })) << "each to its own mount meanwhile";
+    fs::rename(away, folder.Path());
+    EXPECT_TRUE(Eventually(kLimit, [&] { return are_on_shared(true); }));
     for (Machine& machine : machines_) {
         machine.Stop(SIGTERM);
     }

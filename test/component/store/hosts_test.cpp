@@ -180,28 +180,40 @@ TEST_P(HostTest, OfManyOnOneCameraOneGetsTheLease) {
     EXPECT_EQ(taken, 1);
 }
 
-TEST_P(HostTest, OneOfTheHostsThatHaveASharedMountMaintainsItUntilItIsSilentOrWithoutIt) {
+TEST_P(HostTest, OneOfTheHostsThatHaveASharedMountMaintainsItUntilItIsOfflineOrWithoutIt) {
     const int first = hosts_.Add(Named("nvr1"));
     const int second = hosts_.Add(Named("nvr2"));
     const int mount = AddMount("shared", "/srv/shared", kAllHosts);
     SharedMounts shared(store_);
     for (const int host : {first, second, second, 99}) {
-        shared.NotePresence(mount, host, true);
+        shared.SetPresence(mount, host, true);
     }
     EXPECT_EQ(shared.HostsWith(mount), (std::vector<int>{first, second}));
-    EXPECT_FALSE(shared.Take(mount, 99)) << "there is no such host";
-    EXPECT_TRUE(shared.Take(mount, first));
-    EXPECT_FALSE(shared.Take(mount, second)) << "somebody has it";
-    const Host silent = *hosts_.Find(first);
-    RecorderLease(store_, first).Take(silent.heartbeat, "a", 1);
-    EXPECT_FALSE(shared.Take(mount, second, silent)) << "its heartbeat has changed";
-    EXPECT_TRUE(shared.Take(mount, second, *hosts_.Find(first)));
-    EXPECT_EQ(shared.Maintainer(mount), second);
-    shared.NotePresence(mount, second, false);
-    EXPECT_EQ(shared.Maintainer(mount), 0);
-    EXPECT_TRUE(shared.Take(mount, first));
+    EXPECT_FALSE(shared.TakeFree(mount, 99)) << "there is no such host";
+    EXPECT_TRUE(shared.TakeFree(mount, first));
+    EXPECT_FALSE(shared.TakeFree(mount, second)) << "somebody has it";
+    const MountLease stale = shared.Lease(mount);
+    EXPECT_TRUE(shared.Renew(mount, first));
+    EXPECT_FALSE(shared.TakeOver(mount, second, stale)) << "it has been renewed";
+    EXPECT_TRUE(shared.TakeOver(mount, second, shared.Lease(mount)));
+    EXPECT_EQ(shared.Lease(mount).host_id, second);
+    EXPECT_FALSE(shared.Renew(mount, first));
+    const auto change = [&] { mounts_.Add({.name = "added", .path = "/srv/added"}); };
+    EXPECT_THROW(shared.ChangeWithLease(mount, first, change), LeaseLost);
+    EXPECT_THROW(shared.ChangeWithLease(mount, second,
+                                        [&] {
+                                            change();
+                                            throw LeaseLost("later");
+                                        }),
+                 LeaseLost);
+    EXPECT_EQ(mounts_.List().size(), 1U) << "what was changed without it is undone";
+    shared.ChangeWithLease(mount, second, change);
+    EXPECT_EQ(mounts_.List().size(), 2U);
+    shared.SetPresence(mount, second, false);
+    EXPECT_EQ(shared.Lease(mount).host_id, 0);
+    EXPECT_TRUE(shared.TakeFree(mount, first));
     hosts_.Remove(first);
-    EXPECT_EQ(shared.Maintainer(mount), 0);
+    EXPECT_EQ(shared.Lease(mount).host_id, 0);
     EXPECT_EQ(shared.HostsWith(mount), std::vector<int>());
 }
 

@@ -7,6 +7,7 @@
 #include "standalone/archive/layout.h"
 #include "standalone/archive/recording_log.h"
 #include "standalone/archive/span_file.h"
+#include "standalone/store/hosts.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 
@@ -83,6 +84,19 @@ int Footage::Mark(int kind, int camera, std::int64_t start_s, int seconds, const
 
 std::filesystem::path Footage::FileOf(int event) {
     return mount_ / store::Events(records_).Find(event).value().path;
+}
+
+void Footage::ShareMount(int hosts) {
+    for (int number = 1; number <= hosts; ++number) {
+        store::Hosts(records_).Add({.name = "nvr" + std::to_string(number),
+                                    .address = "nvr.example",
+                                    .port = 8443,
+                                    .certificate = "-----BEGIN CERTIFICATE-----\nMII=\n-----END CERTIFICATE-----\n"});
+    }
+    store::Mounts mounts(records_);
+    store::Mount mount = mounts.Find(mount_id_).value();
+    mount.host_id = store::kAllHosts;
+    mounts.Update(mount);
 }
 
 }  // namespace lookhaven::test

@@ -36,6 +36,8 @@ class Footage {
     int Record(int camera, std::int64_t start_s, int seconds);
     // An alert or POS event with footage of the recorded event; returns its id.
     int Mark(int kind, int camera, std::int64_t start_s, int seconds, const std::string& text, int event);
+    // Makes the mount one that hosts 1 … hosts of the store share.
+    void ShareMount(int hosts);
     std::filesystem::path FileOf(int event);
     const std::filesystem::path& Mount() const { return mount_; }
     int MountId() const { return mount_id_; }

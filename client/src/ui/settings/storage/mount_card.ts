@@ -16,8 +16,8 @@ import { forecastText, limitText, stateText } from "./storage_text";
 
 export function mountCard(mount: MountRecord): HTMLElement {
   const { id, name, path, enabled, state, message, total, free } = mount;
-  const isWell = state === "ready";
-  const words = [mount.default ? "default" : "", mount.shared ? "shared by hosts" : "", stateText(mount)];
+  const isWell = state === "ready" || state === "elsewhere";
+  const words = [mount.default ? "default" : "", mount.shared ? "shared" : "", stateText(mount)];
   const marks = words.filter((text) => text).join(" · ");
   const head = element(
     "header",
@@ -28,7 +28,7 @@ export function mountCard(mount: MountRecord): HTMLElement {
     linkButton("Change", settingsAddress("storage", id)),
   );
   head.lastElementChild!.setAttribute("aria-label", `Change ${name}`);
-  const trouble = message ? [element("p", { class: "record-trouble" }, message)] : [];
+  const trouble = message ? [element("p", { class: isWell ? "quiet" : "record-trouble" }, message)] : [];
   const oldest = mount.oldest ? minuteText(mount.oldest * 1000) : "none";
   const facts = factList([
     ["Recordings", bytesText(mount.used)],

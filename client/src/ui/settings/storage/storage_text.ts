@@ -15,6 +15,7 @@ const kStates: Record<string, string> = {
   "in-use": "in use by another recorder",
   "space-held": "deleting frees no space",
   absent: "not mounted",
+  elsewhere: "on other hosts",
   foreign: "belongs to another mount",
   "other-host": "on another host",
 };

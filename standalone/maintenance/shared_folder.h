@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Where the folder of a shared mount (store/shared_mounts.h) is: on this host, or on others that can be asked.
+#pragma once
+
+#include "standalone/base/installation.h"
+#include "standalone/store/mounts.h"
+#include "standalone/store/store.h"
+
+namespace lookhaven::maintenance {
+
+// Whether the mount's folder can be opened on this host. Throws store::StoreError.
+bool IsHere(store::Store& store, const store::Mount& mount);
+
+// Whether the mount is shared, and not here, but on another host that is online as the recorder of this one sees it.
+// Throws store::StoreError, std::system_error.
+bool IsOnlyElsewhere(const base::Installation& installation, store::Store& store, const store::Mount& mount);
+
+}  // namespace lookhaven::maintenance
