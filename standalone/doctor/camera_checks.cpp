@@ -75,6 +75,19 @@ bool IsPaused(RecordingState state) {
     return state != RecordingState::kReady && state != RecordingState::kRecording && state != RecordingState::kNoSignal;
 }
 
+const char* RemedyOfPause(RecordingState state) {
+    switch (state) {
+    case RecordingState::kNoEventId:
+        return "repair the store, which assigns event ids";
+    case RecordingState::kDiskFull:
+        return "free space on its mount's disk, or lower the mount's limit with lookhaven mount set";
+    case RecordingState::kDiskFails:
+        return "look for faults of its mount's disk in the kernel's messages (dmesg), and exchange it";
+    default:
+        return "check that its mount is enabled and in its place with lookhaven mount list";
+    }
+}
+
 }  // namespace
 
 // A camera with an address of HTTPS whose certificate may be anybody's.
@@ -114,12 +127,8 @@ Findings CheckRecordings(const base::Installation& installation) {
             findings.push_back(NoSignal(status, source_options));
         }
         if (IsPaused(status.state)) {
-            const bool lacks_event_id = status.state == RecordingState::kNoEventId;
             findings.push_back({Concat(TitleOf(status), " is not recorded: ", maintenance::NameOf(status.state)),
-                                lacks_event_id
-                                    ? "repair the store, which assigns event ids; recording then resumes by itself"
-                                    : "check that its mount is enabled and in its place with lookhaven mount "
-                                      "list; recording then resumes by itself"});
+                                Concat(RemedyOfPause(status.state), "; recording then resumes by itself")});
         }
     }
     return findings;

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/connection.h"
 
+#include <filesystem>
 #include <string_view>
+#include <system_error>
 
 #include <soci/sqlite3/soci-sqlite3.h>
 
@@ -22,6 +24,12 @@ constexpr const char* kBusyTimeoutMs = "5000";
 constexpr const char* kBriefTimeoutMs = "20";
 
 constexpr std::size_t kMaxNameBytes = 64;
+
+// SQLite itself says of most of what then fails that it is an I/O error.
+bool LiesOnFullDisk(const std::string& file) {
+    std::error_code failure;
+    return !file.empty() && std::filesystem::space(file, failure).available == 0 && !failure;
+}
 
 // A server that is unreachable or hangs must not hold up the recorder or a request for minutes. What the address
 // itself says about connecting goes first.
@@ -68,7 +76,9 @@ StoreAddress StoreAddress::Parse(const std::string& url) {
     throw StoreError("the store's address must begin with sqlite: or postgresql:");
 }
 
-Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
+Connection::Connection(const StoreAddress& address)
+    : engine_(address.engine),
+      file_(IsSqlite() ? address.location : "") {
     try {
         if (engine_ == Engine::kSqlite) {
             ConfigureSqlite();
@@ -89,7 +99,10 @@ Connection::Connection(const StoreAddress& address) : engine_(address.engine) {
 }
 
 void Connection::Fail(const soci::soci_error& error) const {
-    const std::string problem = "the record store failed: " + error.get_error_message();
+    std::string problem = "the record store failed: " + error.get_error_message();
+    if (LiesOnFullDisk(file_)) {
+        problem += ": its disk is full";
+    }
     if (!session_.is_connected()) {
         throw StoreUnavailable(problem);
     }

@@ -132,6 +132,7 @@ class Connection {
     };
 
     Engine engine_;
+    std::string file_;  // of SQLite
     soci::session session_;
     int open_transactions_ = 0;
 };

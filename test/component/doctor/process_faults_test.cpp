@@ -34,12 +34,13 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
                                             .lost_since_s = 1,
                                             .loss = base::SignalLoss::kWrongPassword,
                                             .loss_reason = "cannot open: 401"};
-    auto refused = refuses, untrusted = refuses, mount_gone = refuses, no_id = refuses;
+    auto refused = refuses, untrusted = refuses, mount_gone = refuses, no_id = refuses, full = refuses;
     refused.loss = base::SignalLoss::kRefused;
     untrusted.loss = base::SignalLoss::kCertificate;
-    mount_gone.lost_since_s = no_id.lost_since_s = 0;
+    mount_gone.lost_since_s = no_id.lost_since_s = full.lost_since_s = 0;
     mount_gone.state = maintenance::RecordingState::kMountGone;
     no_id.state = maintenance::RecordingState::kNoEventId;
+    full.state = maintenance::RecordingState::kDiskFull;
     const auto configuration = (home_ / "run/nginx.conf").string();
     const Fault faults[] = {
         {"camera that is down", WriteStatus({refuses}), "(Entrance) has sent no picture since ",
@@ -59,6 +60,7 @@ TEST_F(DoctorTest, FaultsOfWhatRunsAreFoundAndMendedWithoutLoss) {
          }},
         {"camera whose disk is missing", WriteStatus({mount_gone}), "do: check that its mount is enabled",
          WriteStatus({})},
+        {"camera whose disk is full", WriteStatus({full}), "do: free space on its mount's disk", WriteStatus({})},
         {"camera without event ids", WriteStatus({no_id}), "do: repair the store", WriteStatus({})},
         {"another recorder", Sql("update recorder_lease set holder = '/var on nvr2'"), "/var on nvr2",
          Sql("update recorder_lease set holder = ''")},
