@@ -7,9 +7,11 @@
 //               ("c5", "k1"), so that those of other cameras are not even looked at. PostgreSQL's index holds the
 //               camera as an array of one (it has no other index of words and numbers without an extension); the
 //               planner chooses between it and a walk along the time, and looks the cameras up again as numbers, of
-//               which it knows how many there are.
+//               which it knows how many there are. On the walk a text is split into words only where it has the
+//               letters of them all, which takes a quarter of the time to see.
 // See           mark_words_schema.h, which keeps both in step with the marks.
 #include <algorithm>
+#include <sstream>
 #include <string>
 
 #include "standalone/store/connection.h"
@@ -64,6 +66,22 @@ std::vector<Mark> OnSqlite(soci::session& sql, const MarkFilter& filter, std::in
                           kIdMask, expression, first, last, filter.begin_s, filter.limit, filter.offset);
 }
 
+// Patterns with spaces between, which any text that has these words fits. Only words of ASCII: whether others stay as
+// they are while a text is split depends on the server.
+std::string LettersOf(const TextQuery& words) {
+    std::string patterns;
+    for (const TextQuery::Phrase& phrase : words.Phrases()) {
+        if (std::ranges::any_of(phrase.typed, [](char c) { return static_cast<unsigned char>(c) >= 0x80; })) {
+            continue;
+        }
+        std::istringstream typed(phrase.typed);
+        for (std::string word; typed >> word;) {
+            patterns += (patterns.empty() ? "%" : " %") + word + '%';
+        }
+    }
+    return patterns;
+}
+
 std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std::int64_t earliest_s) {
     std::string cameras;
     for (const int camera : filter.camera_ids) {
@@ -74,13 +92,15 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std
     for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
         words += (words.empty() ? "'" : " & '") + phrase.typed + '\'';
     }
+    // The number stands for the truth value, which the planner would take to be rare.
     return FetchAll<Mark>(sql,
                           "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
-                          " and array[camera_id] && cast(:cameras as integer[])"
+                          " and cast(mark_small(text) like all (string_to_array(mark_small(:letters), ' ')) as integer)"
+                          " <> 0 and array[camera_id] && cast(:cameras as integer[])"
                           " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :earliest"
                           " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
                               OrderOf(filter, "start_s", "id"),
-                          words, cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
+                          words, LettersOf(filter.words), cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
                           filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
 }
 

@@ -179,6 +179,7 @@ TEST_P(MarkTest, WordsAreFoundInTextsAndNothingThatIsTypedHasAnotherMeaning) {
         {"tür", {2}},
         {"Tur", {}},
         {"süd hof", {2}},
+        {"SÜD 3", {2}},
         {"ДВЕРЬ", {4}},
         {"07:15", {4}},
         {"ΟΔΟΣ", {7}},
