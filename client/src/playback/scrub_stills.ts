@@ -74,10 +74,9 @@ export class ScrubStills {
     while (this.#wanted.length > 0 && this.#running.size < kMaxConcurrent) void this.#fetch(this.#wanted.shift()!);
   }
 
-  async #fetch(request: ScrubRequest): Promise<void> {
+  async #fetch(request: ScrubRequest, number = (this.#asked += 1)): Promise<void> {
     const { camera, footage, atMs, widthPx } = request;
     const signal = this.#end.signal;
-    const number = (this.#asked += 1);
     if (!footage) return this.#deliver(number, camera, null);
     const known = this.#find(footage, atMs, widthPx);
     if (known) return this.#deliver(number, camera, known.still);
@@ -92,6 +91,8 @@ export class ScrubStills {
     const last = running.get(request)!;
     running.delete(request);
     if (!signal.aborted && still) this.#keep({ footage, widthPx, fromMs: Math.min(still.capturedMs, atMs), toMs: atMs, still });
+    // Who asked while it was on its way gets an attempt of their own.
+    else if (!signal.aborted && last !== number) void this.#fetch(request, last);
     this.#pump();
     if (!signal.aborted && still) await this.#deliver(last, camera, still);
   }

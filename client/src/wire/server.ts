@@ -20,6 +20,8 @@ export interface Account {
 const kAnswerTimeoutMs = 20_000;
 /** Once the last byte of a file has gone, the server may work on it. */
 const kUploadTimeoutMs = 40_000;
+/** The web server's own word, where it has reached nobody. */
+const kNoHost = "the web API does not answer";
 const kTooManyAttempts = "Too many attempts. Please wait a minute.";
 
 /** A request that failed; `message` is for the user. */
@@ -40,7 +42,7 @@ interface CallOptions {
   form?: Record<string, string>;
   json?: unknown;
   quiet?: boolean;
-  signal?: AbortSignal;
+  signal?: AbortSignal | undefined;
   timeoutMs?: number;
   keepalive?: boolean;
 }
@@ -49,7 +51,8 @@ interface Failure {
   error?: { code?: number; message?: string; data?: unknown };
 }
 
-function sentenceFor(status: number, serverMessage: string | undefined): string {
+/** `noAnswer` is for 502, where the host's handler gave none. */
+function sentenceFor(status: number, serverMessage?: string, noAnswer?: string): string {
   switch (status) {
     case 0:
       return "The server does not answer.";
@@ -57,8 +60,11 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
       return "You are not logged in.";
     case 429:
       return serverMessage ? sentenceOf(serverMessage) : kTooManyAttempts;
+    case 502:
+      if (serverMessage === kNoHost) return sentenceFor(0);
+      return noAnswer ?? "The server could not answer (502).";
     case 503:
-      return "The server is busy.";
+      return serverMessage ? sentenceOf(serverMessage) : "The server is busy.";
     case 504:
       return "The camera sends no picture.";
     default:
@@ -69,7 +75,7 @@ function sentenceFor(status: number, serverMessage: string | undefined): string 
   }
 }
 
-async function failureOf(answer: Response): Promise<ServerError> {
+async function failureOf(answer: Response, noAnswer?: string): Promise<ServerError> {
   let failure: Failure = {};
   try {
     failure = ((await answer.json()) as Failure | null) ?? {};
@@ -77,7 +83,7 @@ async function failureOf(answer: Response): Promise<ServerError> {
     // A web server's own error page is not JSON; the status says enough.
   }
   const { code = 0, message, data } = failure.error ?? {};
-  return new ServerError(answer.status, code, sentenceFor(answer.status, message), data ?? null);
+  return new ServerError(answer.status, code, sentenceFor(answer.status, message, noAnswer), data ?? null);
 }
 
 export class Server {
@@ -111,9 +117,9 @@ export class Server {
     return this.call<Account>("VEXO.Auth", "MakeFirstAccount", {}, { form, quiet: true });
   }
 
-  async login(account: string, password: string): Promise<Account> {
+  async login(account: string, password: string, signal?: AbortSignal): Promise<Account> {
     try {
-      return await this.call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true });
+      return await this.call<Account>("VEXO.Auth", "Login", {}, { form: { account, password }, quiet: true, signal });
     } catch (error) {
       const { status, code } = asServerError(error);
       if (status === 401) throw new ServerError(status, code, "The account or the password is wrong.");
@@ -175,8 +181,7 @@ export class Server {
     const answer = await fetch(address(api, method, parameters), { signal });
     if (answer.ok && !/json/i.test(answer.headers.get("Content-Type") ?? "")) return answer;
     if (answer.status === 401) this.#onSessionEnd();
-    const failure = await failureOf(answer);
-    throw failure.status === 502 ? new ServerError(502, failure.code, noAnswer) : failure;
+    throw await failureOf(answer, noAnswer);
   }
 
   /**
@@ -255,5 +260,5 @@ export function asServerError(error: unknown): ServerError {
   if (error instanceof ServerError) return error;
   // fetch reports a lost connection as TypeError and our deadline as AbortError; invalid JSON is a SyntaxError.
   if (error instanceof SyntaxError) return new ServerError(502, 0, "The server's answer is not valid.");
-  return new ServerError(0, 0, sentenceFor(0, undefined));
+  return new ServerError(0, 0, sentenceFor(0));
 }

@@ -78,10 +78,14 @@ describe("the stills of a dragged playhead", () => {
     await answer(0);
     expect(asked).toHaveLength(2);
     expect(shown).toEqual([[1, 2], [1, 1]]);
+    for (const atMs of [3, 3]) request(atMs);
+    await asked[2]!.answer(new Error("lost"));
+    await answer(3);
+    expect(shown.at(-1)).toEqual([1, 3]);
     request(5);
     stills.stop();
     request(5);
-    expect(asked).toHaveLength(4);
+    expect(asked).toHaveLength(6);
   });
 
   test("one that fails leaves the picture, and its place to the next; nothing comes after the end", async () => {

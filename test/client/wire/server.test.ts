@@ -35,6 +35,8 @@ test.each([
   ["a snapshot refused with HTTP 200", snapshot, () => json(200, failure(400)), "The server refused.", false],
   ["a camera that cannot be opened", live, () => json(502, failure(502, "the handler gave no answer")), "No picture was received.", false],
   ["an export whose recordings cannot be read", exported, () => json(502, failure(502, "the handler gave no answer")), "The recordings could not be read.", false],
+  ["an export while the host is away", exported, () => json(502, failure(502, "the web API does not answer")), "The server does not answer.", false],
+  ["footage of a host that is away", exported, () => json(503, failure(503, "the footage is on host B, which is offline")), "The footage is on host B, which is offline.", false],
   ["a stream whose session ended", live, () => json(401, failure(401)), "You are not logged in.", true],
   ["a stream too many", live, () => json(503, failure(503)), "The server is busy.", false],
 ])("says what went wrong: %s", async (_name, call, answer, message, endsSession) => {

@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The log-in screen.
+// The log-in screen. While the server is away it goes on trying, until it is answered or something else is typed.
 
-import { ServerError, type Account, type Server } from "../../wire/server";
+import { isPassing } from "../../playback/failure_reason";
+import { keepTrying } from "../../wire/keep_trying";
+import { asServerError, ServerError, type Account, type Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
 
@@ -35,16 +37,26 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
       message.textContent = `Please enter your ${empty === account ? "account" : "password"}.`;
       return empty.input.focus();
     }
-    message.textContent = "";
-    submit.setAttribute("aria-busy", "true");
-    void server
-      .login(account.input.value, password.input.value)
-      .then(onLogin, (error: unknown) => {
-        message.textContent = error instanceof ServerError ? error.message : String(error);
-        password.input.select();
-      })
-      .finally(() => submit.removeAttribute("aria-busy"));
+    void logIn(account.input.value, password.input.value).finally(() => submit.removeAttribute("aria-busy"));
   });
+
+  async function logIn(name: string, word: string): Promise<void> {
+    const typed = new AbortController();
+    form.addEventListener("input", () => typed.abort(), { once: true });
+    const tell = (sentence: string) => void (message.textContent = sentence);
+    tell("");
+    submit.setAttribute("aria-busy", "true");
+    const ask = () =>
+      server.login(name, word, typed.signal).catch((error: unknown) => {
+        if (isPassing(asServerError(error))) throw error;
+        return asServerError(error);
+      });
+    const answer = await keepTrying(ask, tell, typed.signal);
+    if (!answer) return tell("");
+    if (!(answer instanceof ServerError)) return onLogin(answer);
+    tell(answer.message);
+    password.input.select();
+  }
   return element("main", { class: "login" }, form);
 }
 

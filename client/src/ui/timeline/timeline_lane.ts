@@ -6,7 +6,7 @@
 //               the one before are skipped, and those that touch are painted as one, so that dragging is smooth.
 
 import { kindOf, overlapping, type EventKind, type Segment } from "../../playback/coverage";
-import type { Footage, FootageKind, FootageRef } from "../../wire/footage";
+import { isSameFootage, type Footage, type FootageKind, type FootageRef } from "../../wire/footage";
 import type { LaneOutline } from "../../wire/recordings";
 import type { TimeScale } from "./time_scale";
 import type { Colours } from "./timeline_drawing";
@@ -36,6 +36,8 @@ export function chosenOf(outline: LaneOutline, kinds: ReadonlySet<EventKind>): L
 const kRecorded = "#7a8794";
 const kContinuous = "#a3afbb";
 const kSelected = "#e4eaf0";
+/** What marks say stands above the bars. */
+const kTextPx = 17;
 /** Events of this width or more are drawn apart from their neighbours. */
 const kMinSinglePx = 2;
 
@@ -48,7 +50,7 @@ export function paintLane(
   heightPx: number,
   selected: FootageRef | null,
 ): void {
-  const barTop = topPx + Math.round(heightPx * 0.3);
+  const barTop = topPx + kTextPx;
   const barPx = Math.round(heightPx * 0.42);
   if (lane.outline) paintOutline(context, scale, colours, lane.outline, topPx, barTop, barPx);
   paintBars(context, scale, lane.segments.map(({ startS, stopS }) => [startS, stopS]), barTop, barPx, kRecorded);
@@ -58,13 +60,13 @@ export function paintLane(
   for (const one of shown) {
     if (one.kind !== "event") marks.push(one);
     else (kindOf(one) === "continuous" ? continuous : alarm).push([one.start, one.stop]);
-    if (one.kind === selected?.kind && one.id === selected.id) chosen.push([one.start, one.stop]);
+    if (isSameFootage(one, selected)) chosen.push([one.start, one.stop]);
   }
   paintBars(context, scale, continuous, barTop, barPx, kContinuous);
   paintBars(context, scale, chosen, barTop, barPx, kSelected);
   paintBars(context, scale, alarm, barTop, barPx, colours.accent);
   paintGrowing(context, scale, shown, barTop, barPx, colours);
-  for (const mark of marks) paintMark(context, scale, mark, topPx, barTop, colours, mark.id === selected?.id);
+  for (const mark of marks) paintMark(context, scale, mark, topPx, barTop, colours, isSameFootage(mark, selected));
   paintTexts(context, scale, marks, topPx, colours);
 }
 
@@ -171,7 +173,7 @@ function paintTexts(
     const x = scale.xOf(mark.moment * 1000) + 7;
     const nextX = marks[index + 1] ? scale.xOf(marks[index + 1]!.moment * 1000) - 6 : scale.widthPx;
     const text = fitting(context, mark.text.split("\n")[0]!, nextX - x);
-    if (text) context.fillText(text, x, topPx);
+    if (text) context.fillText(text, x, topPx + 1);
   });
 }
 
