@@ -43,7 +43,8 @@ MountLease SharedMounts::Lease(int mount_id) {
 }
 
 bool SharedMounts::Renew(int mount_id, int host) {
-    return connection_.Execute(kRenew, mount_id, host) > 0;
+    return connection_.Write([&](soci::session& sql) { return Execute(sql, kRenew, mount_id, host); },
+                             Durability::kLazy) > 0;
 }
 
 bool SharedMounts::TakeFree(int mount_id, int host) {
