@@ -126,7 +126,7 @@ void FollowStateFolder(store::Store& store, const base::Installation& installati
             }
             const std::filesystem::path moved = here / path.filename();
             const maintenance::MountMarker marker = maintenance::MarkerFor(store, mount.id);
-            if (mount.IsOf(installation.HostId()) && !std::filesystem::exists(mount.path) &&
+            if (mount.IsOf(installation.HostId()) && !mount.IsShared() && !std::filesystem::exists(mount.path) &&
                 maintenance::MountFolder::ReadMarker(moved) == marker) {
                 const int own_host = admin::OwnHost(store, installation);
                 admin::SetMount(store, {}, mount.id, {}, {.path = moved.string(), .own_host = own_host});

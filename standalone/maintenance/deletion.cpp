@@ -45,6 +45,9 @@ void Deletion::Finish() {
     std::exception_ptr failure;
     try {
         for (; removed < pending.size(); ++removed) {
+            if (removed % kEventsPerBatch == 0) {
+                Change([] {});  // whether this host still may
+            }
             RemoveFile(pending[removed]);
         }
     } catch (const std::system_error&) {

@@ -48,7 +48,7 @@ bool SaveMark(store::Store& store, const store::Mark& mark) {
     const std::vector<store::Event> footage = FootageOf(events, mark);
     if (footage.empty()) {
         base::LogWarning("there is no footage of mark " + std::to_string(mark.id));
-        return store::Marks(store).Miss(mark.id);
+        return store::Marks(store).Miss(mark.id, mark.state);
     }
     const std::optional<store::Mount> mount = store::Mounts(store).Find(footage.back().mount_id);
     const std::optional<MountFolder> folder = mount ? OpenMount(store, *mount) : std::optional<MountFolder>();

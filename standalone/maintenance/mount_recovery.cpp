@@ -7,17 +7,20 @@
 #include <string>
 #include <vector>
 
+#include "standalone/base/clock.h"
 #include "standalone/base/log.h"
 #include "standalone/maintenance/deletion.h"
 #include "standalone/maintenance/inspection.h"
 #include "standalone/maintenance/recording_recovery.h"
 #include "standalone/store/hosts.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::maintenance {
 
 namespace {
 
 constexpr std::int64_t kDayS = 86'400;
+constexpr std::int64_t kRenewUs = 1'000'000;
 
 // What is wrong with one file must not keep the others from being recovered, unless it is the disk that fails. False
 // when something was.
@@ -80,10 +83,34 @@ class RecoveryScope {
     std::set<int> existing_hosts_;
 };
 
+// Keeps the lease of a mount while a long recovery goes on.
+class LeaseRenewal {
+  public:
+    LeaseRenewal(store::Store& store, const store::Mount& mount, const MountRole& role)
+        : shared_(store),
+          mount_id_(mount.id),
+          host_(mount.IsShared() && role.is_maintainer ? role.host : 0) {}
+
+    void Tick() {
+        const std::int64_t now_us = base::MonotonicMicros();
+        if (host_ != 0 && now_us - renewed_us_ >= kRenewUs) {
+            renewed_us_ = now_us;
+            shared_.Renew(mount_id_, host_);
+        }
+    }
+
+  private:
+    store::SharedMounts shared_;
+    const int mount_id_;
+    const int host_;  // 0: there is no lease to keep
+    std::int64_t renewed_us_ = base::MonotonicMicros();
+};
+
 bool ImportRecent(store::Events& events, const MountFolder& mount, int mount_id, const RecoveryScope& scope,
-                  std::int64_t now_s) {
+                  LeaseRenewal& lease, std::int64_t now_s) {
     bool is_complete = true;
     for (const MountFolder::File& file : mount.Files(now_s - kDayS)) {
+        lease.Tick();
         if (file.name.kind == archive::FileKind::kRecording && scope.Covers(file.name) &&
             !IsRowOf(events.Find(file.name.event), file.name)) {
             is_complete &= Try([&] {
@@ -111,12 +138,14 @@ bool Recover(store::Store& store, const store::Mount& mount, int first_reserved_
     store::Events events(store);
     events.SetMissingOrders(mount.id);
     const RecoveryScope scope(store, mount, first_reserved_id, role);
+    LeaseRenewal lease(store, mount, role);
     for (const store::Event& row : events.Open()) {
+        lease.Tick();
         if (row.mount_id == mount.id && scope.Covers(row) && !row.demo) {
             is_complete &= Try([&] { return CloseEvent(events, *folder, row); });
         }
     }
-    return ImportRecent(events, *folder, mount.id, scope, now_s) && is_complete;
+    return ImportRecent(events, *folder, mount.id, scope, lease, now_s) && is_complete;
 }
 
 }  // namespace lookhaven::maintenance

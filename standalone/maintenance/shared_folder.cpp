@@ -21,7 +21,11 @@ bool IsHere(store::Store& store, const store::Mount& mount) {
 }
 
 bool IsOnlyElsewhere(const base::Installation& installation, store::Store& store, const store::Mount& mount) {
-    if (!mount.IsShared() || IsHere(store, mount)) {
+    try {
+        if (!mount.IsShared() || OpenMount(store, mount)) {
+            return false;
+        }
+    } catch (const std::system_error&) {
         return false;
     }
     const int own_host = installation.HostId();

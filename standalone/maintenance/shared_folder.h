@@ -12,8 +12,8 @@ namespace lookhaven::maintenance {
 // Whether the mount's folder can be opened on this host. Throws store::StoreError.
 bool IsHere(store::Store& store, const store::Mount& mount);
 
-// Whether the mount is shared, and not here, but on another host that is online as the recorder of this one sees it.
-// Throws store::StoreError, std::system_error.
+// Whether the mount is shared, and absent here, but on another host that is online as the recorder of this one sees it.
+// False where its folder fails here, which is this host's trouble. Throws store::StoreError, std::system_error.
 bool IsOnlyElsewhere(const base::Installation& installation, store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::maintenance

@@ -31,6 +31,9 @@ class SpaceWatch {
     // After deleting what Allow permitted, with the room before and after.
     void NoteDeleted(std::int64_t deleted, std::int64_t room_before, std::int64_t room_after, std::int64_t now_us);
 
+    // Whether Allow returns 0 now, since what was deleted last has not come back.
+    bool IsPaused(std::int64_t now_us) const { return now_us < until_us_; }
+
     // Deleting freed no space, and a whole pause has passed since. True until nothing is lacking.
     bool IsHeld() const { return is_held_; }
 

@@ -18,6 +18,7 @@
 #include "standalone/store/hosts.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
+#include "standalone/store/shared_mounts.h"
 
 namespace lookhaven::maintenance {
 
@@ -52,6 +53,8 @@ class Verification {
             } catch (const std::system_error& failure) {
                 report_.faults.push_back(
                     {"mount " + std::to_string(mount.id) + " was not checked further: " + failure.what(), ""});
+            } catch (const store::LeaseLost& failure) {
+                report_.faults.push_back({failure.what(), ""});
             }
         }
         return std::move(report_);

@@ -14,20 +14,22 @@ namespace lookhaven::recorder {
 
 class MountLeaseKeeper {
   public:
-    // offline_us: how long a lease may stand still until it is taken over.
+    // offline_us: as in HostWatch. The lease of a host that is offline is taken over, and one that stands still for ten
+    // times as long, since long work may renew it seldom.
     MountLeaseKeeper(int mount_id, int host, std::int64_t offline_us)
         : mount_id_(mount_id),
           host_(host),
           offline_us_(offline_us),
-          watch_(offline_us) {}
+          host_watch_(offline_us),
+          lease_watch_(10 * offline_us) {}
 
-    // Call every second while the folder is mounted here. Renews the lease, or takes it while it is free or stands
-    // still. Throws store::StoreError.
+    // Call every second while the folder is mounted here. Renews the lease, or takes it where that may be taken. Throws
+    // store::StoreError.
     void Update(store::Store& store, std::int64_t now_us);
     // The folder fails here. Throws store::StoreError.
     void GiveUp(store::Store& store);
     // The store says that another host has it now, or nobody.
-    void NoteLost() { is_held_ = false; }
+    void NoteLost();
 
     // As of the last of these calls.
     bool IsHeld() const { return is_held_; }
@@ -43,8 +45,9 @@ class MountLeaseKeeper {
     const int mount_id_;
     const int host_;
     const std::int64_t offline_us_;
-    HostWatch watch_;      // of the lease's count, as a heartbeat of its holder
-    std::set<int> hosts_;  // that share the store
+    HostWatch host_watch_;
+    HostWatch lease_watch_;  // of the lease's count, as a heartbeat of its holder
+    std::set<int> hosts_;    // that share the store
     std::optional<std::int64_t> hosts_changed_us_;
     bool is_held_ = false;
     bool has_changed_ = false;

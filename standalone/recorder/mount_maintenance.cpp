@@ -76,10 +76,15 @@ void MountMaintenance::Work(store::Store& store) {
         return;
     }
     try {
-        Maintain(store, *mount, clock);
-        after_failure_ = {};
+        if (Maintain(store, *mount, clock)) {
+            after_failure_ = {};
+        } else {
+            after_failure_.Begin(now_us);
+        }
     } catch (const store::StoreError&) {
         throw;
+    } catch (const store::LeaseLost&) {
+        lease_.NoteLost();
     } catch (const std::exception& failure) {
         after_failure_.Begin(now_us);
         SetStatus(MountState::kFailing, failure.what());
@@ -89,23 +94,24 @@ void MountMaintenance::Work(store::Store& store) {
     }
 }
 
-void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, const Clock& clock) {
-    std::string why_not = mount.path;
-    const std::optional<maintenance::MountFolder> folder = Open(store, mount, why_not);
+bool MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, const Clock& clock) {
+    std::string failure;
+    const std::optional<maintenance::MountFolder> folder = Open(store, mount, failure);
     if (mount.IsShared()) {
         store::SharedMounts(store).SetPresence(mount.id, context_.host, folder.has_value());
     }
     if (!folder) {
-        SetStatus(MountState::kNotMounted, why_not);
+        SetStatus(MountState::kNotMounted, failure.empty() ? mount.path : failure);
         must_recover_ = true;  // whatever is mounted later
-        is_recovered_ = mount.IsShared();
+        // What failed for a moment may have rows to come.
+        is_recovered_ = mount.IsShared() && (is_recovered_ || failure.empty());
         lease_.NoteLost();
         lock_.Release();
-        return;
+        return failure.empty();
     }
     if (!Acquire(store, mount)) {
         SetStatus(MountState::kInUse, mount.path);
-        return;
+        return true;
     }
     Recover(store, mount, clock);
     const std::int64_t now_us = context_.monotonic_us();
@@ -117,7 +123,7 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
         disk_watch_ = {maintenance::SpaceWatch(true), maintenance::SpaceWatch(true)};
         is_full_of_kept_ = false;
     } else if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests ||
-               (mount.IsShared() && IsShort(*folder))) {  // of other hosts' full disks nothing is heard here
+               (mount.IsShared() && !disk_watch_.bytes.IsPaused(now_us) && IsShort(*folder))) {  // for other hosts
         next_retention_us_ = now_us + kRetentionUs;
         EnforceRetention(store, mount, clock);
         is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
@@ -131,18 +137,19 @@ void MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     } else {
         SetStatus(MountState::kReady, "");
     }
+    return true;
 }
 
 // A shared mount that cannot be opened here is not here: other hosts may have it.
 std::optional<maintenance::MountFolder> MountMaintenance::Open(store::Store& store, const store::Mount& mount,
-                                                               std::string& why_not) {
+                                                               std::string& failure) {
     try {
         return maintenance::OpenMount(store, mount);
     } catch (const std::system_error& error) {
         if (!mount.IsShared()) {
             throw;
         }
-        why_not = error.what();
+        failure = error.what();
         return std::nullopt;
     }
 }
@@ -153,7 +160,10 @@ bool MountMaintenance::AgreesWithStore(store::Store& store, const store::Mount& 
         return true;
     }
     const bool agrees = std::abs(store::SharedMounts(store).ServerTimeS() - clock.now_s) <= kMaxClockDifferenceS;
-    if (std::exchange(agrees_with_store_, agrees) && !agrees) {
+    const bool has_changed = std::exchange(agrees_with_store_, agrees) != agrees;
+    if (has_changed && agrees) {
+        base::LogInfo("mount " + std::to_string(mount.id) + ": maximum ages apply again");
+    } else if (has_changed) {
         base::LogWarning("mount " + std::to_string(mount.id) +
                          ": maximum ages wait, because this host's clock is more"
                          " than five minutes off that of the store's server");

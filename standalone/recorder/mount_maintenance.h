@@ -75,9 +75,10 @@ class MountMaintenance {
     };
 
     void Work(store::Store& store);
-    void Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
+    // False where a shared mount's folder fails: try again after a pause.
+    bool Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
-    std::optional<maintenance::MountFolder> Open(store::Store& store, const store::Mount& mount, std::string& why_not);
+    std::optional<maintenance::MountFolder> Open(store::Store& store, const store::Mount& mount, std::string& failure);
     bool AgreesWithStore(store::Store& store, const store::Mount& mount, const Clock& clock);
     bool Acquire(store::Store& store, const store::Mount& mount);
     void Recover(store::Store& store, const store::Mount& mount, const Clock& clock);

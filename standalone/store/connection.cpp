@@ -141,6 +141,8 @@ Connection::Transaction::Transaction(Connection& connection, Durability durabili
     session_ << (connection.IsSqlite() ? "begin immediate" : "begin");
     is_open_ = true;
     if (!connection.IsSqlite()) {
+        // A machine that stands still in between must not keep its locks until the server's TCP gives it up.
+        session_ << "set local idle_in_transaction_session_timeout = '20s'";
         if (is_lazy) {
             session_ << "set local synchronous_commit = off";
         }

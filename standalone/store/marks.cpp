@@ -123,9 +123,9 @@ bool Marks::Save(int id, int mount_id, const std::string& path) {
                                MarkState::kSaved, mount_id, path, id) > 0;
 }
 
-bool Marks::Miss(int id) {
-    return connection_.Execute("update marks set state = :state where id = :id and state = :pending",
-                               MarkState::kMissed, id, MarkState::kPending) > 0;
+bool Marks::Miss(int id, MarkState state) {
+    return connection_.Execute("update marks set state = :state where id = :id and state = :known", MarkState::kMissed,
+                               id, state) > 0;
 }
 
 bool Marks::Remove(int id) {

@@ -99,9 +99,10 @@ class Marks {
     // Stores rows as they are but under new ids, in one transaction. Throws InvalidRecord.
     void AddAll(const std::vector<Mark>& marks);
 
-    // These are false when there is no such mark. Save throws InvalidRecord for a path that is no text.
+    // These are false when there is no such mark, or for Miss none in that state. Save throws InvalidRecord for a path
+    // that is no text.
     bool Save(int id, int mount_id, const std::string& path);
-    bool Miss(int id);
+    bool Miss(int id, MarkState state = MarkState::kPending);
     bool Remove(int id);
 
     std::optional<Mark> Find(MarkKind kind, int id);
