@@ -15,7 +15,8 @@ await visit(async (first) => {
     await page.locator(content).first().waitFor({ timeout: 20_000 });
     tabs[name] = page;
   };
-  const frame = (page) => page.evaluate(() => Number(/^frame (\d+)/.exec(document.querySelector(".transport-frame").textContent)?.[1]));
+  const told = (page) => page.locator(".transport-frame").textContent();
+  const numberIn = (text) => Number(/^frame (\d+)/.exec(text)?.[1]);
 
   await open("wall", "", '.tile[data-camera="1"][data-state="live"]');
   await open("large", "#camera=1", '.large[data-state="live"]');
@@ -41,7 +42,7 @@ await visit(async (first) => {
   await report("all shown");
 
   await tabs.playing.getByText("The connection was lost. Playback continues").first().waitFor({ timeout: 20_000 });
-  const lost = await frame(tabs.playing);
+  const lost = numberIn(await told(tabs.playing));
   for (const [name, shown] of [["wall", '.tile[data-camera="1"]'], ["large", ".large"]]) {
     await tabs[name].bringToFront();
     await tabs[name].locator(`${shown}:not([data-state="live"])`).first().waitFor({ timeout: 20_000 });
@@ -53,12 +54,17 @@ await visit(async (first) => {
     await tabs[name].getByText("does not answer").first().waitFor({ timeout: 20_000 });
   }
   await tabs.playing.bringToFront();
+  // The first frame that is told from here on, however long it takes to pause.
+  await tabs.playing.evaluate(() => {
+    const shown = document.querySelector(".transport-frame");
+    new MutationObserver(() => (window.resumed ??= shown.textContent)).observe(shown, { childList: true, subtree: true });
+  });
   await report("all told");
 
   await tabs.playing.locator('.stage-picture[data-state="playing"]').first().waitFor({ timeout: 30_000 });
   await tabs.playing.keyboard.press(" ");
   await tabs.playing.locator('.stage-picture[data-state="paused"]').first().waitFor({ timeout: 20_000 });
-  const resumed = await frame(tabs.playing);
+  const resumed = numberIn(await tabs.playing.evaluate(() => window.resumed));
   await tabs.wall.bringToFront();
   await tabs.wall.locator('.tile[data-camera="1"][data-state="live"]').waitFor({ timeout: 30_000 });
   await tabs.large.bringToFront();
@@ -88,7 +94,7 @@ await visit(async (first) => {
   };
   await tabs.playing.bringToFront();
   const link = await shown(tabs.playing);
-  await report("linked", { ...link, frame: await frame(tabs.playing) });
+  await report("linked", { ...link, frame: numberIn(await told(tabs.playing)) });
   await tabs.events.goto("about:blank");
   await tabs.events.goto(address + link.hash);
   await same(tabs.events, "opened");
