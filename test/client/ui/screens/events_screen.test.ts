@@ -175,6 +175,19 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
     await end.waitFor({ state: "hidden" });
   }, 40_000);
 
+  test.each([[390, 844], [844, 390]])("at %i × %i the button of the export is in sight", async (widthPx, heightPx) => {
+    const page = await events.open("#event=21", widthPx, heightPx);
+    await state(page, "playing");
+    await noFocus(page);
+    await page.keyboard.press("x");
+    await page.locator(".export-about", { hasText: "about" }).waitFor();
+    const isInSight = (button: Element) => {
+      const { x, y, width, height } = button.getBoundingClientRect();
+      return button.contains(document.elementFromPoint(x + width / 2, y + height / 2));
+    };
+    expect(await page.locator(".export-panel a").evaluate(isInSight)).toBe(true);
+  }, 40_000);
+
   test.each([
     ["whole", "Exported export.zip, 3.0 MB.", "closed 3000000"],
     ["cut", "The export broke off", "aborted removed"],
