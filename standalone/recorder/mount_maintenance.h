@@ -92,7 +92,7 @@ class MountMaintenance {
     maintenance::ClockWatch clock_watch_;
     maintenance::MountLock lock_;  // of a mount that is not shared
     MountLeaseKeeper lease_;       // of one that is
-    bool must_recover_ = true;     // at the next pass, also where nothing of an earlier recorder is left
+    bool must_recover_ = true;     // at the next pass: the disk, the lease or the hosts have changed
     maintenance::DiskWatch disk_watch_;
     Pause after_failure_;
     Pause after_recovery_;
