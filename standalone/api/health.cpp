@@ -95,16 +95,19 @@ void CheckMounts(const base::Installation& installation, store::Store& records, 
         std::optional<std::string> problem;
         try {
             problem = ProblemOf(records, mount);
+            for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
+                if (!problem && status.mount == mount.id && status.state != maintenance::MountState::kReady) {
+                    problem = std::string(maintenance::NameOf(status.state)) + ' ' + status.reason;
+                }
+            }
+            // A host may do without a shared mount that others have.
+            if (problem && maintenance::IsOnlyElsewhere(installation, records, mount)) {
+                problem.reset();
+            }
         } catch (const std::system_error& error) {
             problem = error.what();
         }
-        for (const maintenance::MountStatus& status : maintenance::ReadMountStatus(installation)) {
-            if (!problem && status.mount == mount.id && status.state != maintenance::MountState::kReady) {
-                problem = std::string(maintenance::NameOf(status.state)) + ' ' + status.reason;
-            }
-        }
-        // A host may do without a shared mount that others have.
-        if (problem && !maintenance::IsOnlyElsewhere(installation, records, mount)) {
+        if (problem) {
             problems.push_back({"mount", mount.id, *problem});
         }
     }
