@@ -90,7 +90,10 @@ class CounterTableWriter {
             std::error_code ignored;
             std::filesystem::remove(path_, ignored);  // an earlier process's numbers are not this one's
             if (!std::exchange(has_failed_, true)) {
-                base::LogError(std::string("monitoring is without some numbers until this works: ") + failure.what());
+                base::LogError(
+                    std::string(
+                        "cannot create a table of counts, which is tried again; monitoring lacks them until then: ") +
+                    failure.what());
             }
         }
     }
